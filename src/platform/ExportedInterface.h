@@ -1,0 +1,126 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstdint>
+#include <memory>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "values/Value.h"
+
+namespace tonewerk {
+
+enum class ParameterType { kInt64, kUInt32, kUInt16, kMap, kInt64ListOrNone };
+
+struct Parameter {
+  std::string_view name;
+  ParameterType type;
+};
+
+// One request that an exported object understands.
+struct Method {
+  std::string_view name;
+  std::vector<Parameter> parameters;
+};
+
+// The request set of an exported object. A request names its method by the place in `methods`.
+struct ExportedInterface {
+  std::vector<Method> methods;
+
+  std::optional<std::size_t> find(std::string_view name) const;
+};
+
+// What a request brought for one parameter; none when it brought nothing where that is allowed.
+using Argument = std::optional<Value>;
+using Arguments = std::vector<Argument>;
+
+// What is wrong with `arguments` for `method` in words that name the argument, or none. An object gets only requests
+// with which nothing is wrong.
+std::optional<std::string> problemWith(const Method& method, const Arguments& arguments);
+
+// An error answer.
+struct ReplyError {
+  std::string domain;
+  std::int64_t code = 0;
+  std::string message;  // empty when domain and code say it all
+
+  friend bool operator==(const ReplyError&, const ReplyError&) = default;
+};
+
+// The errors of the messaging layer itself.
+inline constexpr std::string_view kMessagingErrorDomain = "com.orvane.tonewerk.messaging";
+inline constexpr std::int64_t kUnknownMethod = 1;
+inline constexpr std::int64_t kInvalidArguments = 2;
+inline constexpr std::int64_t kOverLimit = 3;
+
+ReplyError messagingError(std::int64_t code, std::string message);
+
+// Takes answers. Any thread.
+class ReplySink {
+ public:
+  virtual ~ReplySink() = default;
+  // `result` none is nil. With an error there is no result.
+  virtual void reply(std::uint32_t requestIdentifier, const std::optional<ReplyError>& error,
+                     const std::optional<Value>& result) = 0;
+};
+
+// The way back to whoever sent a request. Copyable; may be called never, once or several times, on any thread, also
+// when the peer is gone. An empty one swallows its answer: a notification's.
+class Reply {
+ public:
+  Reply() = default;
+  Reply(std::shared_ptr<ReplySink> sink, std::uint32_t requestIdentifier)
+      : sink_(std::move(sink)), requestIdentifier_(requestIdentifier) {}
+
+  void operator()(const std::optional<ReplyError>& error, const std::optional<Value>& result = std::nullopt) const {
+    if (sink_ != nullptr) sink_->reply(requestIdentifier_, error, result);
+  }
+
+ private:
+  std::shared_ptr<ReplySink> sink_;
+  std::uint32_t requestIdentifier_ = 0;
+};
+
+// Counts the requests of one connection that are not finished. Any thread.
+class RequestGauge {
+ public:
+  virtual ~RequestGauge() = default;
+  virtual void finished(std::size_t bytes) = 0;
+};
+
+// Says, by its destruction, that a request's body has run. Whoever carries the body to a queue carries this with it.
+class RequestToken {
+ public:
+  RequestToken() = default;
+  RequestToken(std::shared_ptr<RequestGauge> gauge, std::size_t bytes) : gauge_(std::move(gauge)), bytes_(bytes) {}
+  RequestToken(RequestToken&&) noexcept = default;
+  RequestToken& operator=(RequestToken&& other) noexcept {
+    finish();
+    gauge_ = std::move(other.gauge_);
+    bytes_ = other.bytes_;
+    return *this;
+  }
+  ~RequestToken() { finish(); }
+
+ private:
+  void finish() {
+    if (gauge_ != nullptr) gauge_->finished(bytes_);
+    gauge_ = nullptr;
+  }
+
+  std::shared_ptr<RequestGauge> gauge_;
+  std::size_t bytes_ = 0;
+};
+
+// What a connection's requests are made to.
+class ExportedObject {
+ public:
+  virtual ~ExportedObject() = default;
+
+  // On the messaging thread, in the order of arrival; must not block. `arguments` suit the method.
+  virtual void handleRequest(std::size_t method, Arguments arguments, Reply reply, RequestToken token) = 0;
+};
+
+}  // namespace tonewerk

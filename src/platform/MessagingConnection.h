@@ -1,0 +1,44 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstdint>
+#include <functional>
+#include <memory>
+#include <string>
+
+#include "platform/ExportedInterface.h"
+
+namespace tonewerk {
+
+// A client's connection, as the listener's delegate sets it up.
+//
+//   accepted -> set up by the delegate -> resumed -> requests ... -> ended
+//                                                                    interruption handler
+//                                                                    invalidation handler
+//                                                                    exported object let go
+//
+// Everything here runs on the messaging thread. After a connection has ended, replies to it go nowhere.
+class MessagingConnection {
+ public:
+  virtual ~MessagingConnection() = default;
+
+  // The peer's, as the kernel says it.
+  virtual std::int32_t processIdentifier() const = 0;
+
+  // For log lines.
+  virtual std::string description() const = 0;
+
+  // Before resume(). `interface` must outlive the connection; `object` is held until the invalidation handler has
+  // returned.
+  virtual void exportObject(const ExportedInterface& interface, std::shared_ptr<ExportedObject> object) = 0;
+
+  // Before resume(). Called when the connection has ended, in one direction or both, first the interruption handler,
+  // then the invalidation handler, once each.
+  virtual void setInterruptionHandler(std::function<void()> handler) = 0;
+  virtual void setInvalidationHandler(std::function<void()> handler) = 0;
+
+  // From now on requests are read.
+  virtual void resume() = 0;
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,35 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+namespace tonewerk {
+
+class Clock;
+class DeviceFacts;
+class FileSystem;
+class JsonService;
+class Log;
+class Metricon;
+class PreferenceStore;
+class ProcessInformation;
+class SerialQueueFactory;
+class SystemInformation;
+class TimerService;
+class TracePoints;
+
+// The operating system's services, as the core sees them. Everything referred to outlives the core.
+struct Platform {
+  Log& log;
+  TracePoints& tracePoints;
+  Clock& clock;
+  SerialQueueFactory& queues;
+  TimerService& timers;
+  ProcessInformation& processes;
+  SystemInformation& system;
+  DeviceFacts& deviceFacts;
+  PreferenceStore& preferences;
+  FileSystem& files;
+  JsonService& json;
+  Metricon& metricon;
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,45 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <memory>
+#include <string>
+
+#include "platform/UniqueFunction.h"
+
+namespace tonewerk {
+
+// Runs pieces of work one after the other, in the order in which they were queued, on one thread at a time.
+//
+// async() and isCurrent() may be called from any thread, async() also from inside a piece of work. Destroying the
+// queue runs what is still queued and then returns; work queued during that is run as well. A queue must not be
+// destroyed from its own work.
+class SerialQueue {
+ public:
+  virtual ~SerialQueue() = default;
+
+  // Never blocks. The work is destroyed on the queue, right after it ran.
+  virtual void async(Task work) = 0;
+
+  // Returns when everything queued before the call has run. Not from the queue's own work.
+  virtual void drain() = 0;
+
+  // True on the thread that is running this queue's work.
+  virtual bool isCurrent() const = 0;
+
+  virtual const std::string& name() const = 0;
+};
+
+enum class QueuePriority {
+  kUtility,          // behind everything a user waits for
+  kUserInteractive,  // the highest class of ordinary threads
+};
+
+class SerialQueueFactory {
+ public:
+  virtual ~SerialQueueFactory() = default;
+
+  // `name` is for people: logs, debuggers and (shortened to 15 bytes) the thread's name.
+  virtual std::unique_ptr<SerialQueue> makeSerialQueue(std::string name, QueuePriority priority) = 0;
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,16 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstdint>
+
+namespace tonewerk {
+
+// Points in the daemon's run that a tracer can listen to. Any thread; costs next to nothing when nobody listens.
+class TracePoints {
+ public:
+  virtual ~TracePoints() = default;
+
+  virtual void emit(std::uint32_t code) = 0;
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,15 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <string>
+
+#include "values/Value.h"
+
+namespace tonewerk {
+
+// Appends `value` as JSON without white space. Dates are RFC 3339 texts; a double always has a fraction or an
+// exponent (2.0), so that it reads back as one; NaN and the infinities, which JSON lacks, are null.
+void appendCompactJson(std::string& out, const Value& value);
+void appendCompactJson(std::string& out, const ValueMap& map);
+
+}  // namespace tonewerk

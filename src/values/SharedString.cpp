@@ -1,0 +1,63 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "values/SharedString.h"
+
+#include <cassert>
+#include <cstring>
+#include <limits>
+#include <new>
+#include <random>
+
+namespace tonewerk {
+namespace {
+
+std::uint64_t processSeed() {
+  static const std::uint64_t seed = [] {
+    std::random_device device;
+    return (static_cast<std::uint64_t>(device()) << 32) | device();
+  }();
+  return seed;
+}
+
+// Multiplies to 128 bits and folds: every bit of both factors reaches every bit of the result.
+std::uint64_t mix(std::uint64_t a, std::uint64_t b) {
+  __extension__ using Product = unsigned __int128;
+  const Product product = static_cast<Product>(a) * b;
+  return static_cast<std::uint64_t>(product) ^ static_cast<std::uint64_t>(product >> 64);
+}
+
+}  // namespace
+
+std::size_t SharedString::hashOf(std::string_view text) {
+  static const std::uint64_t seed = processSeed();
+  constexpr std::uint64_t kOdd = 0x9E3779B97F4A7C15U;
+  std::uint64_t hash = mix(seed ^ text.size(), kOdd);
+  const char* at = text.data();
+  std::size_t left = text.size();
+  while (left > 0) {
+    std::uint64_t word = 0;
+    const std::size_t take = left < sizeof(word) ? left : sizeof(word);
+    std::memcpy(&word, at, take);
+    hash = mix(hash ^ word, seed | kOdd);
+    at += take;
+    left -= take;
+  }
+  return static_cast<std::size_t>(hash);
+}
+
+SharedString::SharedString(std::string_view text) {
+  if (text.empty()) return;
+  assert(text.size() <= std::numeric_limits<std::uint32_t>::max());
+  void* memory = ::operator new(sizeof(Rep) + text.size());
+  rep_ = new (memory) Rep{1, static_cast<std::uint32_t>(text.size()), hashOf(text)};
+  std::memcpy(rep_->text(), text.data(), text.size());
+}
+
+void SharedString::release() {
+  if (rep_ == nullptr) return;
+  if (rep_->references.fetch_sub(1, std::memory_order_acq_rel) == 1) {
+    rep_->~Rep();
+    ::operator delete(rep_);
+  }
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,242 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "values/Value.h"
+
+#include <charconv>
+#include <cmath>
+#include <cstdlib>
+#include <limits>
+#include <optional>
+#include <type_traits>
+
+#include "values/CompactJson.h"
+
+namespace tonewerk {
+namespace {
+
+constexpr double kTwoTo63 = 9223372036854775808.0;
+constexpr double kTwoTo64 = 18446744073709551616.0;
+
+bool isDigit(char c) { return c >= '0' && c <= '9'; }
+bool isSpace(char c) { return c == ' ' || (c >= '\t' && c <= '\r'); }
+
+std::int64_t saturated(double number) {
+  if (std::isnan(number)) return 0;
+  if (number >= kTwoTo63) return std::numeric_limits<std::int64_t>::max();
+  if (number < -kTwoTo63) return std::numeric_limits<std::int64_t>::min();
+  return static_cast<std::int64_t>(number);
+}
+
+// The characters at the start of a text that make a decimal number: spaces, sign, digits, fraction, exponent.
+struct LeadingNumber {
+  std::string_view text;  // without spaces and plus sign; empty without a digit
+  bool isWhole = true;    // neither fraction nor exponent
+};
+
+LeadingNumber leadingNumber(std::string_view text) {
+  std::size_t at = 0;
+  while (at < text.size() && isSpace(text[at])) ++at;
+  std::size_t start = at;
+  if (at < text.size() && (text[at] == '+' || text[at] == '-')) {
+    if (text[at++] == '+') ++start;
+  }
+  const auto digits = [&] {
+    const std::size_t from = at;
+    while (at < text.size() && isDigit(text[at])) ++at;
+    return at - from;
+  };
+  LeadingNumber number;
+  std::size_t count = digits();
+  if (at < text.size() && text[at] == '.') {
+    const std::size_t point = at++;
+    const std::size_t fraction = digits();
+    number.isWhole = false;
+    if (count + fraction == 0) at = point;
+    count += fraction;
+  }
+  if (count == 0) return {};
+  if (at < text.size() && (text[at] == 'e' || text[at] == 'E')) {
+    const std::size_t exponent = at++;
+    if (at < text.size() && (text[at] == '+' || text[at] == '-')) ++at;
+    if (digits() == 0) {
+      at = exponent;
+    } else {
+      number.isWhole = false;
+    }
+  }
+  number.text = text.substr(start, at - start);
+  return number;
+}
+
+double doubleOf(std::string_view digits) {
+  double result = 0.0;
+  const auto parsed = std::from_chars(digits.data(), digits.data() + digits.size(), result);
+  if (parsed.ec != std::errc::result_out_of_range) return result;
+  // Too large or too small for a double; from_chars does not tell which, strtod does.
+  return std::strtod(std::string(digits).c_str(), nullptr);
+}
+
+double numberOfText(std::string_view text) {
+  const LeadingNumber number = leadingNumber(text);
+  return number.text.empty() ? 0.0 : doubleOf(number.text);
+}
+
+std::int64_t integerOfText(std::string_view text) {
+  const LeadingNumber number = leadingNumber(text);
+  if (number.text.empty()) return 0;
+  if (!number.isWhole) return saturated(doubleOf(number.text));
+  std::int64_t result = 0;
+  const auto parsed = std::from_chars(number.text.data(), number.text.data() + number.text.size(), result);
+  if (parsed.ec == std::errc()) return result;
+  return number.text.front() == '-' ? std::numeric_limits<std::int64_t>::min()
+                                    : std::numeric_limits<std::int64_t>::max();
+}
+
+bool booleanOfText(std::string_view text) {
+  if (text.empty()) return false;
+  const char first = text.front();
+  if (first == 'Y' || first == 'y' || first == 'T' || first == 't') return true;
+  return numberOfText(text) != 0.0;
+}
+
+bool sameNumber(std::int64_t a, std::uint64_t b) { return a >= 0 && static_cast<std::uint64_t>(a) == b; }
+bool sameNumber(std::int64_t a, double b) {
+  return b >= -kTwoTo63 && b < kTwoTo63 && std::trunc(b) == b && static_cast<std::int64_t>(b) == a;
+}
+bool sameNumber(std::uint64_t a, double b) {
+  return b >= 0.0 && b < kTwoTo64 && std::trunc(b) == b && static_cast<std::uint64_t>(b) == a;
+}
+bool sameDouble(double a, double b) { return a == b || (std::isnan(a) && std::isnan(b)); }
+
+// A boolean counts as the integer 0 or 1.
+std::optional<std::int64_t> signedOf(const Value& value) {
+  if (const bool* boolean = value.asBoolean()) return *boolean ? 1 : 0;
+  if (const std::int64_t* integer = value.asInteger()) return *integer;
+  return std::nullopt;
+}
+
+bool equalNumbers(const Value& a, const Value& b) {
+  const std::optional<std::int64_t> signedA = signedOf(a);
+  const std::optional<std::int64_t> signedB = signedOf(b);
+  if (signedA && signedB) return *signedA == *signedB;
+  const std::uint64_t* unsignedA = a.asUnsigned();
+  const std::uint64_t* unsignedB = b.asUnsigned();
+  if (unsignedA != nullptr && unsignedB != nullptr) return *unsignedA == *unsignedB;
+  if (signedA && unsignedB != nullptr) return sameNumber(*signedA, *unsignedB);
+  if (unsignedA != nullptr && signedB) return sameNumber(*signedB, *unsignedA);
+  const double* doubleA = a.asDouble();
+  const double* doubleB = b.asDouble();
+  if (doubleA != nullptr && doubleB != nullptr) return sameDouble(*doubleA, *doubleB);
+  if (doubleA != nullptr) return signedB ? sameNumber(*signedB, *doubleA) : sameNumber(*unsignedB, *doubleA);
+  return signedA ? sameNumber(*signedA, *doubleB) : sameNumber(*unsignedA, *doubleB);
+}
+
+bool isNumber(Value::Kind kind) { return kind <= Value::Kind::kDouble; }
+
+template <typename T>
+std::string decimal(T number) {
+  char digits[24];
+  const auto end = std::to_chars(digits, digits + sizeof(digits), number).ptr;
+  return {digits, end};
+}
+
+}  // namespace
+
+bool Value::boolean() const {
+  switch (kind()) {
+    case Kind::kBoolean: return *asBoolean();
+    case Kind::kInteger: return *asInteger() != 0;
+    case Kind::kUnsigned: return *asUnsigned() != 0;
+    case Kind::kDouble: return *asDouble() != 0.0;
+    case Kind::kString: return booleanOfText(*asString());
+    case Kind::kDate: return asDate()->seconds != 0.0;
+    case Kind::kArray:
+    case Kind::kMap: return false;
+  }
+  return false;
+}
+
+std::int64_t Value::integer() const {
+  switch (kind()) {
+    case Kind::kBoolean: return *asBoolean() ? 1 : 0;
+    case Kind::kInteger: return *asInteger();
+    case Kind::kUnsigned: {
+      constexpr std::int64_t kMost = std::numeric_limits<std::int64_t>::max();
+      return *asUnsigned() > static_cast<std::uint64_t>(kMost) ? kMost : static_cast<std::int64_t>(*asUnsigned());
+    }
+    case Kind::kDouble: return saturated(*asDouble());
+    case Kind::kString: return integerOfText(*asString());
+    case Kind::kDate: return saturated(asDate()->seconds);
+    case Kind::kArray:
+    case Kind::kMap: return 0;
+  }
+  return 0;
+}
+
+double Value::number() const {
+  switch (kind()) {
+    case Kind::kBoolean: return *asBoolean() ? 1.0 : 0.0;
+    case Kind::kInteger: return static_cast<double>(*asInteger());
+    case Kind::kUnsigned: return static_cast<double>(*asUnsigned());
+    case Kind::kDouble: return *asDouble();
+    case Kind::kString: return numberOfText(*asString());
+    case Kind::kDate: return asDate()->seconds;
+    case Kind::kArray:
+    case Kind::kMap: return 0.0;
+  }
+  return 0.0;
+}
+
+std::string Value::text() const {
+  switch (kind()) {
+    case Kind::kBoolean: return *asBoolean() ? "1" : "0";
+    case Kind::kInteger: return decimal(*asInteger());
+    case Kind::kUnsigned: return decimal(*asUnsigned());
+    case Kind::kDouble: return textOf(*asDouble());
+    case Kind::kString: return asString()->string();
+    case Kind::kDate: return textOf(*asDate());
+    case Kind::kArray:
+    case Kind::kMap: {
+      std::string out;
+      appendCompactJson(out, *this);
+      return out;
+    }
+  }
+  return {};
+}
+
+std::size_t Value::bytes() const {
+  switch (kind()) {
+    case Kind::kString: return asString()->size();
+    case Kind::kArray: return asArray()->bytes();
+    case Kind::kMap: return asMap()->bytes();
+    default: return 0;
+  }
+}
+
+bool operator==(const Value& a, const Value& b) {
+  if (isNumber(a.kind()) && isNumber(b.kind())) return equalNumbers(a, b);
+  if (a.kind() != b.kind()) return false;
+  switch (a.kind()) {
+    case Value::Kind::kString: return *a.asString() == *b.asString();
+    case Value::Kind::kDate: return *a.asDate() == *b.asDate();
+    case Value::Kind::kArray: return *a.asArray() == *b.asArray();
+    case Value::Kind::kMap: return *a.asMap() == *b.asMap();
+    default: return false;
+  }
+}
+
+std::string textOf(double value) {
+  if (std::isnan(value)) return "nan";
+  if (std::isinf(value)) return value < 0 ? "-inf" : "inf";
+  const double size = std::fabs(value);
+  const bool fixed = size == 0.0 || (size >= 1e-4 && size < 1e16);
+  char digits[32];
+  const auto end = std::to_chars(digits, digits + sizeof(digits), value,
+                                 fixed ? std::chars_format::fixed : std::chars_format::scientific)
+                       .ptr;
+  return {digits, end};
+}
+
+std::string textOf(const Value* value) { return value == nullptr ? "(null)" : value->text(); }
+
+}  // namespace tonewerk

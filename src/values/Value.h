@@ -1,0 +1,99 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <concepts>
+#include <cstdint>
+#include <string>
+#include <string_view>
+#include <utility>
+#include <variant>
+
+#include "values/Date.h"
+#include "values/SharedString.h"
+#include "values/ValueArray.h"
+#include "values/ValueMap.h"
+
+namespace tonewerk {
+
+// One property-list value: a boolean, a signed or unsigned 64-bit integer, a double, a text (UTF-8), a date, an
+// array or a map. 16 bytes; a copy costs at most a reference count.
+//
+// Equality is that of property lists: numbers compare by value across their forms, exactly; a boolean counts as
+// the number 0 or 1; a date never equals a number; NaN equals NaN, so that a value always equals its copy.
+class Value {
+ public:
+  enum class Kind { kBoolean, kInteger, kUnsigned, kDouble, kString, kDate, kArray, kMap };
+
+  // false. A value is never absent: absence is a null pointer or an empty optional.
+  Value() : value_(false) {}
+  // A template, so that a pointer does not turn into a boolean.
+  template <std::same_as<bool> T>
+  Value(T value) : value_(value) {}
+  Value(double value) : value_(value) {}             
+  Value(SharedString text) : value_(std::move(text)) {}
+  Value(std::string_view text) : value_(SharedString(text)) {}
+  Value(const std::string& text) : value_(SharedString(text)) {}
+  Value(const char* text) : value_(SharedString(text)) {}
+  Value(Date date) : value_(date) {}                 
+  Value(ValueArray array) : value_(std::move(array)) {}
+  Value(ValueMap map) : value_(std::move(map)) {}    
+  template <std::signed_integral T>
+  Value(T value) : value_(static_cast<std::int64_t>(value)) {}
+  template <std::unsigned_integral T>
+    requires(!std::same_as<T, bool>)
+  Value(T value) : value_(static_cast<std::uint64_t>(value)) {}
+
+  Kind kind() const { return static_cast<Kind>(value_.index()); }
+
+  // What is inside, or null when it is of another kind.
+  const bool* asBoolean() const { return std::get_if<bool>(&value_); }
+  const std::int64_t* asInteger() const { return std::get_if<std::int64_t>(&value_); }
+  const std::uint64_t* asUnsigned() const { return std::get_if<std::uint64_t>(&value_); }
+  const double* asDouble() const { return std::get_if<double>(&value_); }
+  const SharedString* asString() const { return std::get_if<SharedString>(&value_); }
+  const Date* asDate() const { return std::get_if<Date>(&value_); }
+  const ValueArray* asArray() const { return std::get_if<ValueArray>(&value_); }
+  const ValueMap* asMap() const { return std::get_if<ValueMap>(&value_); }
+
+  // Readings with conversion; none fails.
+  //
+  // Of a number: not zero (NaN is not zero). Of a text: begins with Y, y, T or t, or its leading number is not
+  // zero. Of arrays and maps: false.
+  bool boolean() const;
+  // Of a double: truncated, saturating, 0 for NaN. Of an unsigned one: saturating. Of a text: its leading number
+  // (spaces, sign, digits, fraction, exponent), 0 without one. Of a date: its seconds. Of arrays and maps: 0.
+  std::int64_t integer() const;
+  // The low 32 bits of integer().
+  std::int32_t integer32() const { return static_cast<std::int32_t>(static_cast<std::uint64_t>(integer())); }
+  double number() const;
+
+  // What "%@" prints: integers in decimal, booleans "1" and "0", doubles as textOf() below, texts as they are,
+  // dates as RFC 3339, arrays and maps as compact JSON.
+  std::string text() const;
+
+  // Roughly what it holds on the heap, in bytes, without the 16 of its own. O(1).
+  std::size_t bytes() const;
+
+  friend bool operator==(const Value& a, const Value& b);
+
+ private:
+  std::variant<bool, std::int64_t, std::uint64_t, double, SharedString, Date, ValueArray, ValueMap> value_;
+};
+
+struct ValueMapEntry {
+  SharedString key;
+  Value value;
+};
+
+// The shortest digits that read back as the same double: fixed notation from 1e-4 to below 1e16, else as "1e+22",
+// without a trailing ".0" (2.0 is "2"); "nan", "inf", "-inf", "-0".
+std::string textOf(double value);
+
+// What "%@" prints for a value that may be absent: "(null)" for null.
+std::string textOf(const Value* value);
+
+inline bool booleanOf(const Value* value) { return value != nullptr && value->boolean(); }
+inline std::int64_t integerOf(const Value* value) { return value == nullptr ? 0 : value->integer(); }
+inline double numberOf(const Value* value) { return value == nullptr ? 0.0 : value->number(); }
+
+}  // namespace tonewerk

@@ -1,0 +1,194 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "values/ValueMap.h"
+
+#include <algorithm>
+#include <bit>
+#include <cstdint>
+#include <utility>
+#include <vector>
+
+#include "values/CompactJson.h"
+#include "values/Value.h"
+
+namespace tonewerk {
+namespace {
+
+// Up to here a walk over the keys is quicker than a probe.
+constexpr std::size_t kMostWithoutIndex = 16;
+
+}  // namespace
+
+// The entries in order, and above kMostWithoutIndex a hash table of their places with linear probing.
+struct ValueMap::Rep {
+  std::vector<Entry> entries;
+  std::vector<std::uint32_t> slots;  // place + 1, 0 for none; a power of two at least twice the entries, or empty
+  std::size_t bytes = 0;
+
+  static std::size_t bytesOf(const Entry& entry) {
+    return sizeof(Entry) + entry.key.size() + entry.value.bytes();
+  }
+
+  Entry* find(std::string_view key) {
+    if (slots.empty()) {
+      for (Entry& entry : entries) {
+        if (entry.key.view() == key) return &entry;
+      }
+      return nullptr;
+    }
+    return probe(key, SharedString::hashOf(key));
+  }
+
+  Entry* find(const SharedString& key) {
+    if (!slots.empty()) return probe(key.view(), key.hash());
+    for (Entry& entry : entries) {
+      if (entry.key.sharesStorageWith(key)) return &entry;
+    }
+    return find(key.view());
+  }
+
+  Entry* probe(std::string_view key, std::size_t hash) {
+    const std::size_t mask = slots.size() - 1;
+    for (std::size_t at = hash & mask; slots[at] != 0; at = (at + 1) & mask) {
+      Entry& entry = entries[slots[at] - 1];
+      if (entry.key.hash() == hash && entry.key.view() == key) return &entry;
+    }
+    return nullptr;
+  }
+
+  void append(Entry entry) {
+    bytes += bytesOf(entry);
+    entries.push_back(std::move(entry));
+    if (!slots.empty() && entries.size() * 2 <= slots.size()) {
+      index(entries.size() - 1);
+    } else if (entries.size() > kMostWithoutIndex) {
+      indexAll();
+    }
+  }
+
+  void index(std::size_t place) {
+    const std::size_t mask = slots.size() - 1;
+    std::size_t at = entries[place].key.hash() & mask;
+    while (slots[at] != 0) at = (at + 1) & mask;
+    slots[at] = static_cast<std::uint32_t>(place + 1);
+  }
+
+  void indexAll() {
+    slots.assign(std::bit_ceil(entries.size() * 4), 0);
+    for (std::size_t place = 0; place < entries.size(); ++place) index(place);
+  }
+};
+
+ValueMap::ValueMap() = default;
+ValueMap::ValueMap(const ValueMap&) = default;
+ValueMap::ValueMap(ValueMap&&) noexcept = default;
+ValueMap& ValueMap::operator=(const ValueMap&) = default;
+ValueMap& ValueMap::operator=(ValueMap&&) noexcept = default;
+ValueMap::~ValueMap() = default;
+
+ValueMap::ValueMap(std::initializer_list<Entry> entries) {
+  reserve(entries.size());
+  for (const Entry& entry : entries) set(entry.key, entry.value);
+}
+
+std::size_t ValueMap::size() const {
+  const Rep* rep = rep_.read();
+  return rep == nullptr ? 0 : rep->entries.size();
+}
+
+const ValueMap::Entry* ValueMap::begin() const {
+  const Rep* rep = rep_.read();
+  return rep == nullptr ? nullptr : rep->entries.data();
+}
+
+const ValueMap::Entry* ValueMap::end() const { return begin() + size(); }
+
+const Value* ValueMap::find(std::string_view key) const {
+  const Rep* rep = rep_.read();
+  if (rep == nullptr) return nullptr;
+  // The search itself changes nothing; only its result type does for the writers' sake.
+  const Entry* entry = const_cast<Rep*>(rep)->find(key);
+  return entry == nullptr ? nullptr : &entry->value;
+}
+
+bool ValueMap::boolean(std::string_view key) const { return booleanOf(find(key)); }
+std::int64_t ValueMap::integer(std::string_view key) const { return integerOf(find(key)); }
+double ValueMap::number(std::string_view key) const { return numberOf(find(key)); }
+
+std::string ValueMap::text(std::string_view key) const {
+  const Value* value = find(key);
+  return value == nullptr ? std::string() : value->text();
+}
+
+void ValueMap::set(SharedString key, Value value) {
+  Rep& rep = rep_.write();
+  if (Entry* entry = rep.find(key)) {
+    rep.bytes += value.bytes();
+    rep.bytes -= entry->value.bytes();
+    entry->value = std::move(value);
+    return;
+  }
+  rep.append(Entry{std::move(key), std::move(value)});
+}
+
+bool ValueMap::erase(std::string_view key) {
+  if (!contains(key)) return false;
+  Rep& rep = rep_.write();
+  Entry* entry = rep.find(key);
+  rep.bytes -= Rep::bytesOf(*entry);
+  rep.entries.erase(rep.entries.begin() + (entry - rep.entries.data()));
+  if (!rep.slots.empty()) rep.indexAll();
+  return true;
+}
+
+void ValueMap::merge(const ValueMap& other) {
+  if (empty()) {
+    *this = other;
+    return;
+  }
+  if (sharesStorageWith(other)) return;
+  for (const Entry& entry : other) set(entry.key, entry.value);
+}
+
+void ValueMap::reserve(std::size_t count) {
+  if (count > 0) rep_.write().entries.reserve(count);
+}
+
+std::size_t ValueMap::bytes() const {
+  const Rep* rep = rep_.read();
+  return rep == nullptr ? 0 : rep->bytes;
+}
+
+bool operator==(const ValueMap& a, const ValueMap& b) { return a.equalsIgnoring(b, {}); }
+
+bool ValueMap::equalsIgnoring(const ValueMap& other, std::initializer_list<std::string_view> ignored) const {
+  if (sharesStorageWith(other)) return true;
+  std::size_t left = other.size();
+  std::size_t right = size();
+  for (std::string_view key : ignored) {
+    if (other.contains(key)) --left;
+    if (contains(key)) --right;
+  }
+  if (left != right) return false;
+
+  const auto isIgnored = [&](std::string_view key) {
+    return std::find(ignored.begin(), ignored.end(), key) != ignored.end();
+  };
+  const Entry* guess = other.begin();  // messages of one kind mostly list their keys in one order
+  for (const Entry& entry : *this) {
+    const bool guessed = guess != other.end() && guess->key == entry.key;
+    if (!isIgnored(entry.key)) {
+      const Value* value = guessed ? &guess->value : other.find(entry.key);
+      if (value == nullptr || !(*value == entry.value)) return false;
+    }
+    if (guess != other.end()) ++guess;
+  }
+  return true;
+}
+
+std::string ValueMap::text() const {
+  std::string out;
+  appendCompactJson(out, *this);
+  return out;
+}
+
+}  // namespace tonewerk

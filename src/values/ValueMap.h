@@ -1,0 +1,83 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <initializer_list>
+#include <string>
+#include <string_view>
+
+#include "values/CopyOnWrite.h"
+#include "values/SharedString.h"
+
+namespace tonewerk {
+
+class Value;  // values/Value.h, which a user of this header includes
+struct ValueMapEntry;
+
+// A string-keyed map of property-list values: a message's payload, a session's configuration, a report.
+//
+// Value semantics by copy-on-write. Iteration gives insertion order; replacing a value keeps its key's place.
+//   copy                 a reference count, whatever the size
+//   look-up              up to 16 entries a walk over the keys, above that one hash probe
+//   set, first write     amortised O(1); on a map that shares its storage first a copy of n entries (reference
+//                        counts, no characters)
+//   erase                O(n), to keep the order
+//   merge of m entries   m look-ups and sets; into an empty map a reference count
+//   ==                   a walk of one side with look-ups in the other; O(1) when both share storage
+//
+// Thread-safe as an int is: two maps that share storage may be used, and written, on two threads.
+class ValueMap {
+ public:
+  using Entry = ValueMapEntry;
+
+  ValueMap();
+  ValueMap(std::initializer_list<Entry> entries);
+  ValueMap(const ValueMap&);
+  ValueMap(ValueMap&&) noexcept;
+  ValueMap& operator=(const ValueMap&);
+  ValueMap& operator=(ValueMap&&) noexcept;
+  ~ValueMap();
+
+  std::size_t size() const;
+  bool empty() const { return size() == 0; }
+  const Entry* begin() const;
+  const Entry* end() const;
+
+  // Null when absent; valid until the next write to this map.
+  const Value* find(std::string_view key) const;
+  bool contains(std::string_view key) const { return find(key) != nullptr; }
+
+  // Readings with conversion (see Value); false, 0 and the empty text when absent.
+  bool boolean(std::string_view key) const;
+  std::int64_t integer(std::string_view key) const;
+  double number(std::string_view key) const;
+  std::string text(std::string_view key) const;
+
+  void set(SharedString key, Value value);
+  // True when there was something to erase.
+  bool erase(std::string_view key);
+  // Sets every entry of `other`, whose values win.
+  void merge(const ValueMap& other);
+  // Makes room for `count` entries in all.
+  void reserve(std::size_t count);
+
+  // Roughly what it holds on the heap, in bytes: entries, keys, values, nested ones included. O(1).
+  std::size_t bytes() const;
+  // True when both are the same storage: equal at no cost. False says nothing.
+  bool sharesStorageWith(const ValueMap& other) const { return rep_.sharesWith(other.rep_); }
+
+  // Equal when both hold the same keys with equal values, whatever their order.
+  friend bool operator==(const ValueMap& a, const ValueMap& b);
+  // The same with some keys left out on both sides.
+  bool equalsIgnoring(const ValueMap& other, std::initializer_list<std::string_view> ignored) const;
+
+  // Compact JSON.
+  std::string text() const;
+
+ private:
+  struct Rep;
+  CopyOnWrite<Rep> rep_;
+};
+
+}  // namespace tonewerk
