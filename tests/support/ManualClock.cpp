@@ -1,0 +1,76 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "support/ManualClock.h"
+
+#include <algorithm>
+#include <cassert>
+
+namespace tonewerk {
+namespace {
+
+double secondsOf(std::chrono::nanoseconds duration) {
+  return std::chrono::duration<double>(duration).count();
+}
+
+}  // namespace
+
+double ManualClock::now() const {
+  const std::lock_guard lock(mutex_);
+  return wallAtZero_ + secondsOf(monotonic_);
+}
+
+std::chrono::nanoseconds ManualClock::monotonic() const {
+  const std::lock_guard lock(mutex_);
+  return monotonic_;
+}
+
+std::chrono::minutes ManualClock::utcOffset(double) const {
+  const std::lock_guard lock(mutex_);
+  return utcOffset_;
+}
+
+void ManualClock::advance(std::chrono::nanoseconds duration) {
+  assert(duration.count() >= 0);
+  const std::chrono::nanoseconds end = monotonic() + duration;
+  while (Alarm* alarm = earliestUntil(end)) {
+    // An alarm may itself have moved the clock past the next one's time.
+    moveTo(std::max(monotonic(), *alarm->nextDue()));
+    alarm->runNext();
+  }
+  moveTo(std::max(monotonic(), end));
+}
+
+void ManualClock::advance(double seconds) {
+  advance(std::chrono::round<std::chrono::nanoseconds>(std::chrono::duration<double>(seconds)));
+}
+
+void ManualClock::setNow(double seconds) {
+  const std::lock_guard lock(mutex_);
+  wallAtZero_ = seconds - secondsOf(monotonic_);
+}
+
+void ManualClock::setUtcOffset(std::chrono::minutes offset) {
+  const std::lock_guard lock(mutex_);
+  utcOffset_ = offset;
+}
+
+void ManualClock::addAlarm(Alarm& alarm) { alarms_.push_back(&alarm); }
+void ManualClock::removeAlarm(Alarm& alarm) { std::erase(alarms_, &alarm); }
+
+ManualClock::Alarm* ManualClock::earliestUntil(std::chrono::nanoseconds end) const {
+  Alarm* earliest = nullptr;
+  std::chrono::nanoseconds due = end;
+  for (Alarm* alarm : alarms_) {
+    const auto next = alarm->nextDue();
+    if (!next || *next > due || (earliest != nullptr && *next == due)) continue;
+    earliest = alarm;
+    due = *next;
+  }
+  return earliest;
+}
+
+void ManualClock::moveTo(std::chrono::nanoseconds monotonic) {
+  const std::lock_guard lock(mutex_);
+  monotonic_ = monotonic;
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,61 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <chrono>
+#include <mutex>
+#include <optional>
+#include <vector>
+
+#include "platform/Clock.h"
+
+namespace tonewerk {
+
+// A clock that stands still until a test moves it.
+//
+//   ManualClock clock;
+//   clock.advance(2.5);                      // both times, running the timers that become due on the way
+//   clock.setNow(1'000'000'000.0);           // the wall clock jumps, monotonic time does not
+//
+// Any thread may read it; one thread moves it.
+class ManualClock final : public Clock {
+ public:
+  static constexpr double kStart = 1'763'633'880.0;  // 2025-11-20T10:18:00Z
+
+  // Something that wants to run when monotonic time reaches a moment: ManualTimers.
+  class Alarm {
+   public:
+    virtual ~Alarm() = default;
+    // None when nothing waits.
+    virtual std::optional<std::chrono::nanoseconds> nextDue() const = 0;
+    // Runs one thing that is due; called with the clock at nextDue().
+    virtual void runNext() = 0;
+  };
+
+  explicit ManualClock(double now = kStart) : wallAtZero_(now) {}
+
+  double now() const override;
+  std::chrono::nanoseconds monotonic() const override;
+  std::chrono::minutes utcOffset(double at) const override;
+
+  // Moves both times forward. What is due on the way runs in order, each at its own time.
+  void advance(std::chrono::nanoseconds duration);
+  void advance(double seconds);
+  void setNow(double seconds);
+  void setUtcOffset(std::chrono::minutes offset);
+
+  // `alarm` is removed before it dies.
+  void addAlarm(Alarm& alarm);
+  void removeAlarm(Alarm& alarm);
+
+ private:
+  Alarm* earliestUntil(std::chrono::nanoseconds end) const;
+  void moveTo(std::chrono::nanoseconds monotonic);
+
+  mutable std::mutex mutex_;  // guards the three times
+  double wallAtZero_;         // wall-clock time when monotonic time was 0
+  std::chrono::nanoseconds monotonic_{0};
+  std::chrono::minutes utcOffset_{0};
+  std::vector<Alarm*> alarms_;
+};
+
+}  // namespace tonewerk

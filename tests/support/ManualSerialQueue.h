@@ -1,0 +1,53 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <atomic>
+#include <cstddef>
+#include <functional>
+#include <mutex>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "platform/SerialQueue.h"
+
+namespace tonewerk {
+
+// A queue without a thread: work waits until the test runs it, on the test's own thread.
+//
+//   ManualSerialQueue queue("work");
+//   queue.async([&] { done = true; });
+//   queue.runAll();                          // also runs what the work itself queues
+//
+// async() from any thread; what runs work (runAll, drain, the destructor) from one thread at a time.
+class ManualSerialQueue final : public SerialQueue {
+ public:
+  explicit ManualSerialQueue(std::string name, QueuePriority priority = QueuePriority::kUtility)
+      : name_(std::move(name)), priority_(priority) {}
+  ManualSerialQueue(const ManualSerialQueue&) = delete;
+  ManualSerialQueue& operator=(const ManualSerialQueue&) = delete;
+  ~ManualSerialQueue() override;
+
+  void async(Task work) override;
+  void drain() override { runAll(); }
+  bool isCurrent() const override { return runner_.load() == std::this_thread::get_id(); }
+  const std::string& name() const override { return name_; }
+
+  // Runs until nothing waits; how many pieces ran. Not from the queue's own work.
+  std::size_t runAll();
+  std::size_t pendingCount() const;
+  QueuePriority priority() const { return priority_; }
+
+  // Runs at the end of the destructor. For ManualQueues.
+  void setDestructionHandler(std::function<void()> handler) { onDestruction_ = std::move(handler); }
+
+ private:
+  const std::string name_;
+  const QueuePriority priority_;
+  mutable std::mutex mutex_;
+  std::vector<Task> pending_;  // guarded by mutex_
+  std::atomic<std::thread::id> runner_{};
+  std::function<void()> onDestruction_;
+};
+
+}  // namespace tonewerk

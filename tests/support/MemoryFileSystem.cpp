@@ -1,0 +1,139 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "support/MemoryFileSystem.h"
+
+#include <cassert>
+#include <string_view>
+
+namespace tonewerk {
+namespace {
+
+bool isPlainName(std::string_view name) {
+  return !name.empty() && name != "." && name != ".." && name.find('/') == std::string_view::npos &&
+         name.find('\0') == std::string_view::npos;
+}
+
+}  // namespace
+
+class MemoryFileSystem::File final : public WritableFile {
+ public:
+  File(std::shared_ptr<State> state, std::string path) : state_(std::move(state)), path_(std::move(path)) {}
+  File(const File&) = delete;
+  File& operator=(const File&) = delete;
+  ~File() override {
+    const std::lock_guard lock(state_->mutex);
+    if (!isClosed_) --state_->openFiles;
+  }
+
+  std::error_code write(std::string_view text) override {
+    const std::lock_guard lock(state_->mutex);
+    assert(!isClosed_);
+    if (state_->writesUntilFailure > 0 && --state_->writesUntilFailure == 0) {
+      return std::make_error_code(state_->writeFailure);
+    }
+    state_->files[path_] += text;
+    return {};
+  }
+
+  std::error_code close() override {
+    const std::lock_guard lock(state_->mutex);
+    assert(!isClosed_);
+    isClosed_ = true;
+    --state_->openFiles;
+    return state_->closeFailure == std::errc() ? std::error_code()
+                                               : std::make_error_code(state_->closeFailure);
+  }
+
+ private:
+  std::shared_ptr<State> state_;
+  const std::string path_;
+  bool isClosed_ = false;
+};
+
+MemoryFileSystem::MemoryFileSystem() : state_(std::make_shared<State>()) { state_->directories["/"] = 0755; }
+
+std::error_code MemoryFileSystem::createDirectories(const std::string& path, unsigned mode) {
+  const std::lock_guard lock(state_->mutex);
+  if (state_->createDirectoriesFailure != std::errc()) {
+    return std::make_error_code(state_->createDirectoriesFailure);
+  }
+  for (std::size_t slash = path.find('/', 1);; slash = path.find('/', slash + 1)) {
+    const std::string part = path.substr(0, slash);
+    if (state_->files.contains(part)) return std::make_error_code(std::errc::not_a_directory);
+    state_->directories.try_emplace(part, mode);
+    if (slash == std::string::npos) return {};
+  }
+}
+
+std::unique_ptr<WritableFile> MemoryFileSystem::createFile(const std::string& directory,
+                                                           const std::string& name, std::error_code& error) {
+  const std::lock_guard lock(state_->mutex);
+  const std::string path = directory + "/" + name;
+  error.clear();
+  if (state_->createFileFailure != std::errc()) {
+    error = std::make_error_code(state_->createFileFailure);
+  } else if (!isPlainName(name)) {
+    error = std::make_error_code(std::errc::invalid_argument);
+  } else if (!state_->directories.contains(directory)) {
+    error = std::make_error_code(std::errc::no_such_file_or_directory);
+  } else if (state_->links.contains(path)) {
+    error = std::make_error_code(std::errc::too_many_symbolic_link_levels);
+  } else if (state_->directories.contains(path)) {
+    error = std::make_error_code(std::errc::is_a_directory);
+  }
+  if (error) return nullptr;
+  state_->files[path].clear();
+  ++state_->openFiles;
+  return std::make_unique<File>(state_, path);
+}
+
+void MemoryFileSystem::failCreateDirectories(std::errc error) {
+  const std::lock_guard lock(state_->mutex);
+  state_->createDirectoriesFailure = error;
+}
+
+void MemoryFileSystem::failCreateFile(std::errc error) {
+  const std::lock_guard lock(state_->mutex);
+  state_->createFileFailure = error;
+}
+
+void MemoryFileSystem::failWrite(int nth, std::errc error) {
+  const std::lock_guard lock(state_->mutex);
+  state_->writesUntilFailure = nth;
+  state_->writeFailure = error;
+}
+
+void MemoryFileSystem::failClose(std::errc error) {
+  const std::lock_guard lock(state_->mutex);
+  state_->closeFailure = error;
+}
+
+void MemoryFileSystem::addSymbolicLink(const std::string& path) {
+  const std::lock_guard lock(state_->mutex);
+  state_->links.insert(path);
+}
+
+std::optional<std::string> MemoryFileSystem::contents(const std::string& path) const {
+  const std::lock_guard lock(state_->mutex);
+  const auto found = state_->files.find(path);
+  return found == state_->files.end() ? std::nullopt : std::optional(found->second);
+}
+
+std::vector<std::string> MemoryFileSystem::files() const {
+  const std::lock_guard lock(state_->mutex);
+  std::vector<std::string> paths;
+  for (const auto& [path, text] : state_->files) paths.push_back(path);
+  return paths;
+}
+
+std::optional<unsigned> MemoryFileSystem::directoryMode(const std::string& path) const {
+  const std::lock_guard lock(state_->mutex);
+  const auto found = state_->directories.find(path);
+  return found == state_->directories.end() ? std::nullopt : std::optional(found->second);
+}
+
+int MemoryFileSystem::openFiles() const {
+  const std::lock_guard lock(state_->mutex);
+  return state_->openFiles;
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,67 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <map>
+#include <memory>
+#include <mutex>
+#include <optional>
+#include <set>
+#include <string>
+#include <vector>
+
+#include "platform/FileSystem.h"
+
+namespace tonewerk {
+
+// Directories and files in memory, with failures on demand. Any thread.
+//
+//   MemoryFileSystem files;
+//   files.failWrite(2, std::errc::no_space_on_device);       // the second write() from now on
+//   ...
+//   EXPECT_EQ(files.contents("/logs/Audio/summary.json"), "{}");
+//
+// Paths are compared as they are written; they begin with a slash and do not end with one.
+class MemoryFileSystem final : public FileSystem {
+ public:
+  MemoryFileSystem();
+
+  std::error_code createDirectories(const std::string& path, unsigned mode) override;
+  std::unique_ptr<WritableFile> createFile(const std::string& directory, const std::string& name,
+                                           std::error_code& error) override;
+
+  // std::errc() makes the call succeed again.
+  void failCreateDirectories(std::errc error);
+  void failCreateFile(std::errc error);
+  // The `nth` write() from now on fails, 1 the next one; every other succeeds.
+  void failWrite(int nth, std::errc error);
+  void failClose(std::errc error);
+  // createFile() fails where one stands.
+  void addSymbolicLink(const std::string& path);
+
+  // What was written so far; none without such a file.
+  std::optional<std::string> contents(const std::string& path) const;
+  std::vector<std::string> files() const;
+  // The mode that the directory was made with; none without such a directory.
+  std::optional<unsigned> directoryMode(const std::string& path) const;
+  // How many files are open.
+  int openFiles() const;
+
+ private:
+  struct State {
+    mutable std::mutex mutex;  // guards all below
+    std::map<std::string, unsigned> directories;
+    std::map<std::string, std::string> files;
+    std::set<std::string> links;
+    std::errc createDirectoriesFailure{};
+    std::errc createFileFailure{};
+    std::errc writeFailure{};
+    int writesUntilFailure = 0;  // 0 for none
+    std::errc closeFailure{};
+    int openFiles = 0;
+  };
+  class File;
+
+  std::shared_ptr<State> state_;  // shared with the open files
+};
+
+}  // namespace tonewerk

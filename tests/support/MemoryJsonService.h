@@ -1,0 +1,17 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include "platform/JsonService.h"
+
+namespace tonewerk {
+
+// JSON without the daemon's JSON adapter: compact text by the values' own writer, pretty text by a few lines
+// of its own, indented by two spaces. Any thread.
+class MemoryJsonService final : public JsonService {
+ public:
+  std::string compact(const ValueMap& map) const override;
+  std::optional<std::string> pretty(const ValueMap& map, std::string& problem) const override;
+  std::optional<Value> parse(std::string_view text, std::string& problem) const override;
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,60 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <map>
+#include <mutex>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "platform/Log.h"
+
+namespace tonewerk {
+
+// Keeps log lines for a test to look at. Everything is enabled until a threshold is set. Any thread.
+//
+//   MemoryLog log;
+//   EXPECT_THAT(log.textsOf("twrr"), ElementsAre("stop called. reporterID=77"));
+//   EXPECT_THAT(log.linesOf("twrs", LogLevel::kError), IsEmpty());
+class MemoryLog final : public Log {
+ public:
+  struct Line {
+    std::string subsystem;
+    std::string category;
+    LogLevel level = LogLevel::kDefault;
+    std::string message;  // prefix included
+
+    std::string text() const { return withoutPrefix(message); }
+    friend bool operator==(const Line&, const Line&) = default;
+  };
+
+  // `message` without its "%25s:%-5d " of source file and line; as it is when it begins with no such prefix.
+  static std::string withoutPrefix(std::string_view message);
+
+  bool isEnabled(std::string_view category, LogLevel level) const override;
+  void write(std::string_view subsystem, std::string_view category, LogLevel level,
+             std::string_view message) override;
+
+  // From now on only lines of at least this level: everywhere, or of one category.
+  void setThreshold(LogLevel level);
+  void setThreshold(std::string_view category, LogLevel level);
+
+  std::vector<Line> lines() const;
+  std::vector<Line> linesOf(std::string_view category) const;
+  std::vector<Line> linesOf(std::string_view category, LogLevel level) const;
+  // The messages without their prefixes.
+  std::vector<std::string> textsOf(std::string_view category) const;
+  std::vector<std::string> textsOf(std::string_view category, LogLevel level) const;
+  // Of all categories.
+  std::vector<std::string> textsAt(LogLevel level) const;
+  // Forgets the lines, keeps the thresholds.
+  void clear();
+
+ private:
+  mutable std::mutex mutex_;  // guards all below
+  LogLevel threshold_ = LogLevel::kDebug;
+  std::map<std::string, LogLevel, std::less<>> thresholds_;
+  std::vector<Line> lines_;
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,58 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "support/MemoryMetricon.h"
+
+#include <fnmatch.h>
+
+namespace tonewerk {
+
+bool MemoryMetricon::isEventUsed(std::string_view name) {
+  const std::lock_guard lock(mutex_);
+  return isUsed_(name);
+}
+
+void MemoryMetricon::sendEvent(const SharedString& name, const UniqueFunction<ValueMap()>& payload) {
+  if (!isEventUsed(name)) return;
+  Event event{name.string(), payload()};
+  const std::lock_guard lock(mutex_);
+  events_.push_back(std::move(event));
+}
+
+void MemoryMetricon::useOnly(std::vector<std::string> patterns) {
+  useOnly([held = std::move(patterns)](std::string_view name) {
+    for (const std::string& pattern : held) {
+      if (fnmatch(pattern.c_str(), std::string(name).c_str(), 0) == 0) return true;
+    }
+    return false;
+  });
+}
+
+void MemoryMetricon::useOnly(std::function<bool(std::string_view name)> isUsed) {
+  const std::lock_guard lock(mutex_);
+  isUsed_ = std::move(isUsed);
+}
+
+std::vector<MemoryMetricon::Event> MemoryMetricon::events() const {
+  const std::lock_guard lock(mutex_);
+  return events_;
+}
+
+std::vector<std::string> MemoryMetricon::names() const {
+  std::vector<std::string> names;
+  for (const Event& event : events()) names.push_back(event.name);
+  return names;
+}
+
+std::vector<ValueMap> MemoryMetricon::eventsNamed(std::string_view name) const {
+  std::vector<ValueMap> payloads;
+  for (const Event& event : events()) {
+    if (event.name == name) payloads.push_back(event.payload);
+  }
+  return payloads;
+}
+
+void MemoryMetricon::clear() {
+  const std::lock_guard lock(mutex_);
+  events_.clear();
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,43 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <functional>
+#include <mutex>
+#include <string>
+#include <vector>
+
+#include "platform/Metricon.h"
+
+namespace tonewerk {
+
+// Keeps the events that were recorded. Every event is used until the test narrows it down. Any thread.
+//
+//   metricon.useOnly({"com.orvane.audio.*"});
+//   EXPECT_THAT(metricon.eventsNamed("com.orvane.audio.volume"), SizeIs(1));
+class MemoryMetricon final : public Metricon {
+ public:
+  struct Event {
+    std::string name;
+    ValueMap payload;
+  };
+
+  bool isEventUsed(std::string_view name) override;
+  void sendEvent(const SharedString& name, const UniqueFunction<ValueMap()>& payload) override;
+
+  // From now on only events that match one of these glob patterns, or the predicate, are used.
+  void useOnly(std::vector<std::string> patterns);
+  void useOnly(std::function<bool(std::string_view name)> isUsed);
+
+  std::vector<Event> events() const;
+  std::vector<std::string> names() const;
+  // The payloads of the events of this name.
+  std::vector<ValueMap> eventsNamed(std::string_view name) const;
+  void clear();
+
+ private:
+  mutable std::mutex mutex_;  // guards all below
+  std::function<bool(std::string_view name)> isUsed_ = [](std::string_view) { return true; };
+  std::vector<Event> events_;
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,46 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <map>
+#include <mutex>
+#include <string>
+
+#include "platform/PreferenceStore.h"
+
+namespace tonewerk {
+
+// Preferences that live as long as the test. Any thread.
+//
+//   preferences.configure("com.orvane.x", "limit", 5);       // what the device's configuration says
+//   preferences.write("com.orvane.x", "limit", 6);           // what somebody set
+//   preferences.failWrites(std::errc::no_space_on_device);   // from now on
+class MemoryPreferenceStore final : public PreferenceStore {
+ public:
+  std::optional<Value> read(std::string_view domain, std::string_view key) const override;
+  ValueMap readAll(std::string_view domain) const override;
+  std::error_code write(std::string_view domain, std::string_view key, const Value& value,
+                        std::string* problem = nullptr) override;
+  std::error_code remove(std::string_view domain, std::string_view key,
+                         std::string* problem = nullptr) override;
+
+  void configure(std::string_view domain, std::string_view key, const Value& value);
+  // std::errc() makes writes succeed again.
+  void failWrites(std::errc error);
+  // What was written and differs from the configuration.
+  ValueMap written(std::string_view domain) const;
+
+ private:
+  struct Domain {
+    ValueMap configured;
+    ValueMap written;
+  };
+
+  const Domain* find(std::string_view domain) const;
+  std::error_code checkWrite(std::string_view domain, std::string* problem) const;
+
+  mutable std::mutex mutex_;  // guards all below
+  std::map<std::string, Domain, std::less<>> domains_;
+  std::errc failure_{};
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,52 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include "platform/Platform.h"
+#include "support/ManualClock.h"
+#include "support/ManualQueues.h"
+#include "support/ManualTimers.h"
+#include "support/MemoryDeviceFacts.h"
+#include "support/MemoryFileSystem.h"
+#include "support/MemoryJsonService.h"
+#include "support/MemoryLog.h"
+#include "support/MemoryMetricon.h"
+#include "support/MemoryPreferenceStore.h"
+#include "support/MemoryProcessInformation.h"
+#include "support/MemorySystemInformation.h"
+#include "support/MemoryTracePoints.h"
+
+namespace tonewerk {
+
+// The operating system in memory: one of each double, and the Platform made of them.
+//
+//   TestPlatform test;
+//   TWReportingService service(test.platform());
+//   test.clock.advance(5.0);
+//   test.queues.runAll();
+//
+// Declare it before what uses it, so that it dies last.
+struct TestPlatform {
+  TestPlatform() = default;
+  TestPlatform(const TestPlatform&) = delete;
+  TestPlatform& operator=(const TestPlatform&) = delete;
+
+  Platform platform() {
+    return {log,    tracePoints, clock,       queues, timers, processes,
+            system, deviceFacts, preferences, files,  json,   metricon};
+  }
+
+  MemoryLog log;
+  MemoryTracePoints tracePoints;
+  ManualClock clock;
+  ManualQueues queues;
+  ManualTimers timers{clock};
+  MemoryProcessInformation processes;
+  MemorySystemInformation system;
+  MemoryDeviceFacts deviceFacts;
+  MemoryPreferenceStore preferences;
+  MemoryFileSystem files;
+  MemoryJsonService json;
+  MemoryMetricon metricon;
+};
+
+}  // namespace tonewerk
