@@ -136,7 +136,11 @@ bool ValueMap::erase(std::string_view key) {
   Entry* entry = rep.find(key);
   rep.bytes -= Rep::bytesOf(*entry);
   rep.entries.erase(rep.entries.begin() + (entry - rep.entries.data()));
-  if (!rep.slots.empty()) rep.indexAll();
+  if (rep.entries.size() > kMostWithoutIndex) {
+    rep.indexAll();
+  } else {
+    rep.slots.clear();  // a table of few slots would fill up unnoticed
+  }
   return true;
 }
 
