@@ -33,22 +33,32 @@ bool isInt64List(const Value& value) {
 bool suits(ParameterType type, const Argument& argument) {
   if (!argument) return type == ParameterType::kInt64ListOrNone;
   switch (type) {
-    case ParameterType::kInt64: return isInt64(*argument);
-    case ParameterType::kUInt32: return isIntegerWithin(*argument, 0, std::numeric_limits<std::uint32_t>::max());
-    case ParameterType::kUInt16: return isIntegerWithin(*argument, 0, std::numeric_limits<std::uint16_t>::max());
-    case ParameterType::kMap: return argument->asMap() != nullptr;
-    case ParameterType::kInt64ListOrNone: return isInt64List(*argument);
+    case ParameterType::kInt64:
+      return isInt64(*argument);
+    case ParameterType::kUInt32:
+      return isIntegerWithin(*argument, 0, std::numeric_limits<std::uint32_t>::max());
+    case ParameterType::kUInt16:
+      return isIntegerWithin(*argument, 0, std::numeric_limits<std::uint16_t>::max());
+    case ParameterType::kMap:
+      return argument->asMap() != nullptr;
+    case ParameterType::kInt64ListOrNone:
+      return isInt64List(*argument);
   }
   return false;
 }
 
 std::string_view wordsFor(ParameterType type) {
   switch (type) {
-    case ParameterType::kInt64: return "a signed 64-bit integer";
-    case ParameterType::kUInt32: return "an integer from 0 to 4294967295";
-    case ParameterType::kUInt16: return "an integer from 0 to 65535";
-    case ParameterType::kMap: return "a map";
-    case ParameterType::kInt64ListOrNone: return "a list of signed 64-bit integers or nil";
+    case ParameterType::kInt64:
+      return "a signed 64-bit integer";
+    case ParameterType::kUInt32:
+      return "an integer from 0 to 4294967295";
+    case ParameterType::kUInt16:
+      return "an integer from 0 to 65535";
+    case ParameterType::kMap:
+      return "a map";
+    case ParameterType::kInt64ListOrNone:
+      return "a list of signed 64-bit integers or nil";
   }
   return "";
 }

@@ -36,8 +36,8 @@ struct ExportedInterface {
 using Argument = std::optional<Value>;
 using Arguments = std::vector<Argument>;
 
-// What is wrong with `arguments` for `method` in words that name the argument, or none. An object gets only requests
-// with which nothing is wrong.
+// What is wrong with `arguments` for `method` in words that name the argument, or none. An object gets only
+// requests with which nothing is wrong.
 std::optional<std::string> problemWith(const Method& method, const Arguments& arguments);
 
 // An error answer.
@@ -66,15 +66,16 @@ class ReplySink {
                      const std::optional<Value>& result) = 0;
 };
 
-// The way back to whoever sent a request. Copyable; may be called never, once or several times, on any thread, also
-// when the peer is gone. An empty one swallows its answer: a notification's.
+// The way back to whoever sent a request. Copyable; may be called never, once or several times, on any
+// thread, also when the peer is gone. An empty one swallows its answer: a notification's.
 class Reply {
  public:
   Reply() = default;
   Reply(std::shared_ptr<ReplySink> sink, std::uint32_t requestIdentifier)
       : sink_(std::move(sink)), requestIdentifier_(requestIdentifier) {}
 
-  void operator()(const std::optional<ReplyError>& error, const std::optional<Value>& result = std::nullopt) const {
+  void operator()(const std::optional<ReplyError>& error,
+                  const std::optional<Value>& result = std::nullopt) const {
     if (sink_ != nullptr) sink_->reply(requestIdentifier_, error, result);
   }
 
@@ -90,11 +91,13 @@ class RequestGauge {
   virtual void finished(std::size_t bytes) = 0;
 };
 
-// Says, by its destruction, that a request's body has run. Whoever carries the body to a queue carries this with it.
+// Says, by its destruction, that a request's body has run. Whoever carries the body to a queue carries this
+// with it.
 class RequestToken {
  public:
   RequestToken() = default;
-  RequestToken(std::shared_ptr<RequestGauge> gauge, std::size_t bytes) : gauge_(std::move(gauge)), bytes_(bytes) {}
+  RequestToken(std::shared_ptr<RequestGauge> gauge, std::size_t bytes)
+      : gauge_(std::move(gauge)), bytes_(bytes) {}
   RequestToken(RequestToken&&) noexcept = default;
   RequestToken& operator=(RequestToken&& other) noexcept {
     finish();

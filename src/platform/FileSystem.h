@@ -25,8 +25,8 @@ class FileSystem {
  public:
   virtual ~FileSystem() = default;
 
-  // The directory and what is missing above it. `mode` (as 0777) is what a directory made here gets, whatever the
-  // process's file mode mask. No error when it exists.
+  // The directory and what is missing above it. `mode` (as 0777) is what a directory made here gets, whatever
+  // the process's file mode mask. No error when it exists.
   [[nodiscard]] virtual std::error_code createDirectories(const std::string& path, unsigned mode) = 0;
 
   // Creates `name` in `directory`, or empties it, and opens it. Fails when the file would not lie directly in

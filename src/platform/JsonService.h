@@ -17,8 +17,8 @@ class JsonService {
   // Without white space, for the store: NaN and infinities become null. Dates become RFC 3339 texts.
   virtual std::string compact(const ValueMap& map) const = 0;
 
-  // Indented over several lines, for people. None when the map holds what JSON cannot say (NaN, an infinity); then
-  // `problem` names it.
+  // Indented over several lines, for people. None when the map holds what JSON cannot say (NaN, an infinity);
+  // then `problem` names it.
   virtual std::optional<std::string> pretty(const ValueMap& map, std::string& problem) const = 0;
 
   // None when `text` is not one JSON value that values can express (null is not); then `problem` says where.

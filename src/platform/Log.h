@@ -16,8 +16,8 @@ class Log {
  public:
   virtual ~Log() = default;
 
-  // Whether a line of this category code (such as "twrr") and level would be written. Cheap: asked for every line
-  // before it is formatted.
+  // Whether a line of this category code (such as "twrr") and level would be written. Cheap: asked for every
+  // line before it is formatted.
   virtual bool isEnabled(std::string_view category, LogLevel level) const = 0;
 
   // `message` as it is to be read, prefix included. `subsystem` as "com.orvane.tonewerk". Never fails: what

@@ -19,7 +19,9 @@ class LogCategory {
   LogCategory& operator=(const LogCategory&) = delete;
 
   bool isEnabled(LogLevel level) const { return log_.isEnabled(code_, level); }
-  void write(LogLevel level, std::string_view message) const { log_.write(subsystem_, code_, level, message); }
+  void write(LogLevel level, std::string_view message) const {
+    log_.write(subsystem_, code_, level, message);
+  }
 
   std::string_view subsystem() const { return subsystem_; }
   std::string_view code() const { return code_; }

@@ -21,9 +21,9 @@ namespace tonewerk {
 //   debugLog(TWReportingSessionCategory(), "stop called. reporterID=%lli", reporterID_);
 //
 // Below its category's threshold a line costs a comparison; its arguments are then not turned into text. A
-// conversion says how its argument is shown, the argument's own type says what it is: %@ shows anything, %i, %d,
-// %u, %li, %lli, %lu, %ld and %zu an integer, %f a number with six decimals, %s a text. A format with another
-// number of conversions than arguments does not compile.
+// conversion says how its argument is shown, the argument's own type says what it is: %@ shows anything, %i,
+// %d, %u, %li, %lli, %lu, %ld and %zu an integer, %f a number with six decimals, %s a text. A format with
+// another number of conversions than arguments does not compile.
 
 // How an argument becomes text. Overload for more types, or give them a description().
 inline void appendLogText(std::string& out, std::string_view text) { out += text; }
@@ -49,7 +49,8 @@ void appendLogArgument(std::string& out, const T& argument, char conversion) {
     appendLogArgument(out, argument(), conversion);  // text that is only made when it is wanted
   } else if constexpr (requires { appendLogText(out, argument); }) {
     appendLogText(out, argument);
-  } else if constexpr (requires { argument.has_value(); } || requires { argument.get(); }) {
+  } else if constexpr (
+      requires { argument.has_value(); } || requires { argument.get(); }) {
     if (argument) {
       appendLogArgument(out, *argument, conversion);
     } else {
@@ -68,9 +69,11 @@ void appendLogArgument(std::string& out, const T& argument, char conversion) {
 
 // Where a line was written. Made out of the category, so that the call's own file and line are taken.
 struct LogSite {
-  LogSite(const LogCategory* logCategory, const char* logFile = __builtin_FILE(), int logLine = __builtin_LINE())
+  LogSite(const LogCategory* logCategory, const char* logFile = __builtin_FILE(),
+          int logLine = __builtin_LINE())
       : category(logCategory), file(logFile), line(logLine) {}
-  LogSite(const LogCategory& logCategory, const char* logFile = __builtin_FILE(), int logLine = __builtin_LINE())
+  LogSite(const LogCategory& logCategory, const char* logFile = __builtin_FILE(),
+          int logLine = __builtin_LINE())
       : LogSite(&logCategory, logFile, logLine) {}
   const LogCategory* category;
   const char* file;

@@ -28,12 +28,12 @@ class MessagingConnection {
   // For log lines.
   virtual std::string description() const = 0;
 
-  // Before resume(). `interface` must outlive the connection; `object` is held until the invalidation handler has
-  // returned.
+  // Before resume(). `interface` must outlive the connection; `object` is held until the invalidation handler
+  // has returned.
   virtual void exportObject(const ExportedInterface& interface, std::shared_ptr<ExportedObject> object) = 0;
 
-  // Before resume(). Called when the connection has ended, in one direction or both, first the interruption handler,
-  // then the invalidation handler, once each.
+  // Before resume(). Called when the connection has ended, in one direction or both, first the interruption
+  // handler, then the invalidation handler, once each.
   virtual void setInterruptionHandler(std::function<void()> handler) = 0;
   virtual void setInvalidationHandler(std::function<void()> handler) = 0;
 

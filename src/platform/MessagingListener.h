@@ -11,8 +11,8 @@ class MessagingListenerDelegate {
  public:
   virtual ~MessagingListenerDelegate() = default;
 
-  // On the messaging thread, for every new connection, before anything is read from it. False turns it away. The
-  // connection belongs to the listener and lives until its invalidation handler has returned.
+  // On the messaging thread, for every new connection, before anything is read from it. False turns it away.
+  // The connection belongs to the listener and lives until its invalidation handler has returned.
   virtual bool listenerShouldAcceptNewConnection(MessagingConnection& connection) = 0;
 };
 

@@ -16,8 +16,8 @@ class Metricon {
   // Whether any analytics consumer has asked for events of this name.
   virtual bool isEventUsed(std::string_view name) = 0;
 
-  // Records an event. `payload` is called at most once, before sendEvent() returns, and only when the event is
-  // recorded. May wait while the recorder's queue is full (see docs/architecture.md, "Back pressure").
+  // Records an event. `payload` is called at most once, before sendEvent() returns, and only when the event
+  // is recorded. May wait while the recorder's queue is full (see docs/architecture.md, "Back pressure").
   virtual void sendEvent(const SharedString& name, const UniqueFunction<ValueMap()>& payload) = 0;
 };
 

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <string>
+
 namespace tonewerk {
 
 class Clock;
@@ -30,6 +32,8 @@ struct Platform {
   FileSystem& files;
   JsonService& json;
   Metricon& metricon;
+  // Where reports for people go; absolute.
+  std::string logsDirectory = {};
 };
 
 }  // namespace tonewerk

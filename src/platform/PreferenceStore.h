@@ -23,10 +23,10 @@ class PreferenceStore {
   // Everything the domain holds, overlaid.
   virtual ValueMap readAll(std::string_view domain) const = 0;
 
-  // On disk when it returns without an error. A failure (a value that the store cannot express, a file that does
-  // not parse, a full disk) changes nothing; `problem` then says it in words when it is not null.
-  [[nodiscard]] virtual std::error_code write(std::string_view domain, std::string_view key, const Value& value,
-                                              std::string* problem = nullptr) = 0;
+  // On disk when it returns without an error. A failure (a value that the store cannot express, a file that
+  // does not parse, a full disk) changes nothing; `problem` then says it in words when it is not null.
+  [[nodiscard]] virtual std::error_code write(std::string_view domain, std::string_view key,
+                                              const Value& value, std::string* problem = nullptr) = 0;
 
   // Fails with std::errc::no_such_file_or_directory for a key that is nowhere, and with
   // std::errc::operation_not_permitted for one that only the configuration holds.

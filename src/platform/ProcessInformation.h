@@ -19,8 +19,8 @@ class ProcessInformation {
   // This process.
   virtual std::int32_t ownProcessIdentifier() const = 0;
 
-  // Memory that this process keeps from others, in bytes: resident and swapped anonymous memory. On failure the
-  // operating system's text of why.
+  // Memory that this process keeps from others, in bytes: resident and swapped anonymous memory. On failure
+  // the operating system's text of why.
   virtual std::variant<std::uint64_t, std::string> physicalFootprint() const = 0;
 
   // Processor time of this process so far, in microseconds (the ticks of the C library's processor clock).

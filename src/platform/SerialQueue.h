@@ -10,9 +10,9 @@ namespace tonewerk {
 
 // Runs pieces of work one after the other, in the order in which they were queued, on one thread at a time.
 //
-// async() and isCurrent() may be called from any thread, async() also from inside a piece of work. Destroying the
-// queue runs what is still queued and then returns; work queued during that is run as well. A queue must not be
-// destroyed from its own work.
+// async() and isCurrent() may be called from any thread, async() also from inside a piece of work. Destroying
+// the queue runs what is still queued and then returns; work queued during that is run as well. A queue must
+// not be destroyed from its own work.
 class SerialQueue {
  public:
   virtual ~SerialQueue() = default;

@@ -19,8 +19,8 @@ class TimerService {
  public:
   virtual ~TimerService() = default;
 
-  // Runs `tick` every `interval` on the timers' thread, first after one interval. A tick that takes longer than
-  // the interval delays the next one; missed ticks are not made up for.
+  // Runs `tick` every `interval` on the timers' thread, first after one interval. A tick that takes longer
+  // than the interval delays the next one; missed ticks are not made up for.
   virtual std::unique_ptr<Timer> repeat(std::chrono::milliseconds interval, std::function<void()> tick) = 0;
 };
 

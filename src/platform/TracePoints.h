@@ -5,7 +5,8 @@
 
 namespace tonewerk {
 
-// Points in the daemon's run that a tracer can listen to. Any thread; costs next to nothing when nobody listens.
+// Points in the daemon's run that a tracer can listen to. Any thread; costs next to nothing when nobody
+// listens.
 class TracePoints {
  public:
   virtual ~TracePoints() = default;

@@ -11,21 +11,24 @@ namespace tonewerk {
 template <typename Signature>
 class UniqueFunction;
 
-// A callable that can be moved but not copied, so that it may own what it works on (a payload, a reply, a token
-// whose destruction means something). Empty when made without a callable or moved from; calling it then is an error.
+// A callable that can be moved but not copied, so that it may own what it works on (a payload, a reply, a
+// token whose destruction means something). Empty when made without a callable or moved from; calling it then
+// is an error.
 template <typename Result, typename... Arguments>
 class UniqueFunction<Result(Arguments...)> {
  public:
   UniqueFunction() = default;
   UniqueFunction(std::nullptr_t) {}
   template <typename Callable>
-    requires(!std::same_as<std::remove_cvref_t<Callable>, UniqueFunction> &&
-             std::is_invocable_r_v<Result, std::remove_cvref_t<Callable>&, Arguments...>)
-  UniqueFunction(Callable&& callable)
+  requires(!std::same_as<std::remove_cvref_t<Callable>, UniqueFunction> &&
+           std::is_invocable_r_v<Result, std::remove_cvref_t<Callable>&, Arguments...>)
+      UniqueFunction(Callable&& callable)
       : held_(std::make_unique<Holder<std::remove_cvref_t<Callable>>>(std::forward<Callable>(callable))) {}
 
   explicit operator bool() const { return held_ != nullptr; }
-  Result operator()(Arguments... arguments) const { return held_->call(std::forward<Arguments>(arguments)...); }
+  Result operator()(Arguments... arguments) const {
+    return held_->call(std::forward<Arguments>(arguments)...);
+  }
 
  private:
   struct Base {

@@ -27,14 +27,29 @@ void appendDouble(std::string& out, double number) {
 void appendEscaped(std::string& out, unsigned char c) {
   constexpr char kHex[] = "0123456789abcdef";
   switch (c) {
-    case '"': out += "\\\""; return;
-    case '\\': out += "\\\\"; return;
-    case '\b': out += "\\b"; return;
-    case '\f': out += "\\f"; return;
-    case '\n': out += "\\n"; return;
-    case '\r': out += "\\r"; return;
-    case '\t': out += "\\t"; return;
-    default: break;
+    case '"':
+      out += "\\\"";
+      return;
+    case '\\':
+      out += "\\\\";
+      return;
+    case '\b':
+      out += "\\b";
+      return;
+    case '\f':
+      out += "\\f";
+      return;
+    case '\n':
+      out += "\\n";
+      return;
+    case '\r':
+      out += "\\r";
+      return;
+    case '\t':
+      out += "\\t";
+      return;
+    default:
+      break;
   }
   out += "\\u00";
   out += kHex[c >> 4];
@@ -59,14 +74,23 @@ void appendString(std::string& out, std::string_view text) {
 
 void appendCompactJson(std::string& out, const Value& value) {
   switch (value.kind()) {
-    case Value::Kind::kBoolean: out += *value.asBoolean() ? "true" : "false"; return;
-    case Value::Kind::kInteger: return appendDecimal(out, *value.asInteger());
-    case Value::Kind::kUnsigned: return appendDecimal(out, *value.asUnsigned());
-    case Value::Kind::kDouble: return appendDouble(out, *value.asDouble());
-    case Value::Kind::kString: return appendString(out, *value.asString());
-    case Value::Kind::kDate: return appendString(out, textOf(*value.asDate()));
-    case Value::Kind::kMap: return appendCompactJson(out, *value.asMap());
-    case Value::Kind::kArray: break;
+    case Value::Kind::kBoolean:
+      out += *value.asBoolean() ? "true" : "false";
+      return;
+    case Value::Kind::kInteger:
+      return appendDecimal(out, *value.asInteger());
+    case Value::Kind::kUnsigned:
+      return appendDecimal(out, *value.asUnsigned());
+    case Value::Kind::kDouble:
+      return appendDouble(out, *value.asDouble());
+    case Value::Kind::kString:
+      return appendString(out, *value.asString());
+    case Value::Kind::kDate:
+      return appendString(out, textOf(*value.asDate()));
+    case Value::Kind::kMap:
+      return appendCompactJson(out, *value.asMap());
+    case Value::Kind::kArray:
+      break;
   }
   out += '[';
   for (const Value& element : *value.asArray()) {

@@ -9,8 +9,8 @@
 namespace tonewerk {
 
 std::string textOf(Date date) {
-  constexpr double kFirst = -62167219200.0;       // 0000-01-01T00:00:00Z
-  constexpr double kLast = 253402300799.999999;   // 9999-12-31T23:59:59.999999Z
+  constexpr double kFirst = -62167219200.0;      // 0000-01-01T00:00:00Z
+  constexpr double kLast = 253402300799.999999;  // 9999-12-31T23:59:59.999999Z
   const double seconds = std::isnan(date.seconds) ? 0.0 : std::clamp(date.seconds, kFirst, kLast);
 
   // Seconds and microseconds apart: a double of today's date has no digits to spare for a product.

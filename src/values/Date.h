@@ -15,8 +15,8 @@ struct Date {
   }
 };
 
-// RFC 3339 in UTC with up to six fraction digits, as "2026-11-20T10:18:00.5Z". What that form cannot say (years
-// outside 0000 to 9999, NaN) reads as the nearest date it can say, NaN as 1970.
+// RFC 3339 in UTC with up to six fraction digits, as "2026-11-20T10:18:00.5Z". What that form cannot say
+// (years outside 0000 to 9999, NaN) reads as the nearest date it can say, NaN as 1970.
 std::string textOf(Date date);
 
 }  // namespace tonewerk

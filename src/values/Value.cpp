@@ -143,57 +143,84 @@ std::string decimal(T number) {
 
 bool Value::boolean() const {
   switch (kind()) {
-    case Kind::kBoolean: return *asBoolean();
-    case Kind::kInteger: return *asInteger() != 0;
-    case Kind::kUnsigned: return *asUnsigned() != 0;
-    case Kind::kDouble: return *asDouble() != 0.0;
-    case Kind::kString: return booleanOfText(*asString());
-    case Kind::kDate: return asDate()->seconds != 0.0;
+    case Kind::kBoolean:
+      return *asBoolean();
+    case Kind::kInteger:
+      return *asInteger() != 0;
+    case Kind::kUnsigned:
+      return *asUnsigned() != 0;
+    case Kind::kDouble:
+      return *asDouble() != 0.0;
+    case Kind::kString:
+      return booleanOfText(*asString());
+    case Kind::kDate:
+      return asDate()->seconds != 0.0;
     case Kind::kArray:
-    case Kind::kMap: return false;
+    case Kind::kMap:
+      return false;
   }
   return false;
 }
 
 std::int64_t Value::integer() const {
   switch (kind()) {
-    case Kind::kBoolean: return *asBoolean() ? 1 : 0;
-    case Kind::kInteger: return *asInteger();
+    case Kind::kBoolean:
+      return *asBoolean() ? 1 : 0;
+    case Kind::kInteger:
+      return *asInteger();
     case Kind::kUnsigned: {
       constexpr std::int64_t kMost = std::numeric_limits<std::int64_t>::max();
-      return *asUnsigned() > static_cast<std::uint64_t>(kMost) ? kMost : static_cast<std::int64_t>(*asUnsigned());
+      return *asUnsigned() > static_cast<std::uint64_t>(kMost) ? kMost
+                                                               : static_cast<std::int64_t>(*asUnsigned());
     }
-    case Kind::kDouble: return saturated(*asDouble());
-    case Kind::kString: return integerOfText(*asString());
-    case Kind::kDate: return saturated(asDate()->seconds);
+    case Kind::kDouble:
+      return saturated(*asDouble());
+    case Kind::kString:
+      return integerOfText(*asString());
+    case Kind::kDate:
+      return saturated(asDate()->seconds);
     case Kind::kArray:
-    case Kind::kMap: return 0;
+    case Kind::kMap:
+      return 0;
   }
   return 0;
 }
 
 double Value::number() const {
   switch (kind()) {
-    case Kind::kBoolean: return *asBoolean() ? 1.0 : 0.0;
-    case Kind::kInteger: return static_cast<double>(*asInteger());
-    case Kind::kUnsigned: return static_cast<double>(*asUnsigned());
-    case Kind::kDouble: return *asDouble();
-    case Kind::kString: return numberOfText(*asString());
-    case Kind::kDate: return asDate()->seconds;
+    case Kind::kBoolean:
+      return *asBoolean() ? 1.0 : 0.0;
+    case Kind::kInteger:
+      return static_cast<double>(*asInteger());
+    case Kind::kUnsigned:
+      return static_cast<double>(*asUnsigned());
+    case Kind::kDouble:
+      return *asDouble();
+    case Kind::kString:
+      return numberOfText(*asString());
+    case Kind::kDate:
+      return asDate()->seconds;
     case Kind::kArray:
-    case Kind::kMap: return 0.0;
+    case Kind::kMap:
+      return 0.0;
   }
   return 0.0;
 }
 
 std::string Value::text() const {
   switch (kind()) {
-    case Kind::kBoolean: return *asBoolean() ? "1" : "0";
-    case Kind::kInteger: return decimal(*asInteger());
-    case Kind::kUnsigned: return decimal(*asUnsigned());
-    case Kind::kDouble: return textOf(*asDouble());
-    case Kind::kString: return asString()->string();
-    case Kind::kDate: return textOf(*asDate());
+    case Kind::kBoolean:
+      return *asBoolean() ? "1" : "0";
+    case Kind::kInteger:
+      return decimal(*asInteger());
+    case Kind::kUnsigned:
+      return decimal(*asUnsigned());
+    case Kind::kDouble:
+      return textOf(*asDouble());
+    case Kind::kString:
+      return asString()->string();
+    case Kind::kDate:
+      return textOf(*asDate());
     case Kind::kArray:
     case Kind::kMap: {
       std::string out;
@@ -206,10 +233,14 @@ std::string Value::text() const {
 
 std::size_t Value::bytes() const {
   switch (kind()) {
-    case Kind::kString: return asString()->size();
-    case Kind::kArray: return asArray()->bytes();
-    case Kind::kMap: return asMap()->bytes();
-    default: return 0;
+    case Kind::kString:
+      return asString()->size();
+    case Kind::kArray:
+      return asArray()->bytes();
+    case Kind::kMap:
+      return asMap()->bytes();
+    default:
+      return 0;
   }
 }
 
@@ -217,11 +248,16 @@ bool operator==(const Value& a, const Value& b) {
   if (isNumber(a.kind()) && isNumber(b.kind())) return equalNumbers(a, b);
   if (a.kind() != b.kind()) return false;
   switch (a.kind()) {
-    case Value::Kind::kString: return *a.asString() == *b.asString();
-    case Value::Kind::kDate: return *a.asDate() == *b.asDate();
-    case Value::Kind::kArray: return *a.asArray() == *b.asArray();
-    case Value::Kind::kMap: return *a.asMap() == *b.asMap();
-    default: return false;
+    case Value::Kind::kString:
+      return *a.asString() == *b.asString();
+    case Value::Kind::kDate:
+      return *a.asDate() == *b.asDate();
+    case Value::Kind::kArray:
+      return *a.asArray() == *b.asArray();
+    case Value::Kind::kMap:
+      return *a.asMap() == *b.asMap();
+    default:
+      return false;
   }
 }
 

@@ -15,11 +15,11 @@
 
 namespace tonewerk {
 
-// One property-list value: a boolean, a signed or unsigned 64-bit integer, a double, a text (UTF-8), a date, an
-// array or a map. 16 bytes; a copy costs at most a reference count.
+// One property-list value: a boolean, a signed or unsigned 64-bit integer, a double, a text (UTF-8), a date,
+// an array or a map. 16 bytes; a copy costs at most a reference count.
 //
-// Equality is that of property lists: numbers compare by value across their forms, exactly; a boolean counts as
-// the number 0 or 1; a date never equals a number; NaN equals NaN, so that a value always equals its copy.
+// Equality is that of property lists: numbers compare by value across their forms, exactly; a boolean counts
+// as the number 0 or 1; a date never equals a number; NaN equals NaN, so that a value always equals its copy.
 class Value {
  public:
   enum class Kind { kBoolean, kInteger, kUnsigned, kDouble, kString, kDate, kArray, kMap };
@@ -29,19 +29,18 @@ class Value {
   // A template, so that a pointer does not turn into a boolean.
   template <std::same_as<bool> T>
   Value(T value) : value_(value) {}
-  Value(double value) : value_(value) {}             
+  Value(double value) : value_(value) {}
   Value(SharedString text) : value_(std::move(text)) {}
   Value(std::string_view text) : value_(SharedString(text)) {}
   Value(const std::string& text) : value_(SharedString(text)) {}
   Value(const char* text) : value_(SharedString(text)) {}
-  Value(Date date) : value_(date) {}                 
+  Value(Date date) : value_(date) {}
   Value(ValueArray array) : value_(std::move(array)) {}
-  Value(ValueMap map) : value_(std::move(map)) {}    
+  Value(ValueMap map) : value_(std::move(map)) {}
   template <std::signed_integral T>
   Value(T value) : value_(static_cast<std::int64_t>(value)) {}
   template <std::unsigned_integral T>
-    requires(!std::same_as<T, bool>)
-  Value(T value) : value_(static_cast<std::uint64_t>(value)) {}
+  requires(!std::same_as<T, bool>) Value(T value) : value_(static_cast<std::uint64_t>(value)) {}
 
   Kind kind() const { return static_cast<Kind>(value_.index()); }
 
@@ -57,18 +56,19 @@ class Value {
 
   // Readings with conversion; none fails.
   //
-  // Of a number: not zero (NaN is not zero). Of a text: begins with Y, y, T or t, or its leading number is not
-  // zero. Of arrays and maps: false.
+  // Of a number: not zero (NaN is not zero). Of a text: begins with Y, y, T or t, or its leading number is
+  // not zero. Of arrays and maps: false.
   bool boolean() const;
-  // Of a double: truncated, saturating, 0 for NaN. Of an unsigned one: saturating. Of a text: its leading number
-  // (spaces, sign, digits, fraction, exponent), 0 without one. Of a date: its seconds. Of arrays and maps: 0.
+  // Of a double: truncated, saturating, 0 for NaN. Of an unsigned one: saturating. Of a text: its leading
+  // number (spaces, sign, digits, fraction, exponent), 0 without one. Of a date: its seconds. Of arrays and
+  // maps: 0.
   std::int64_t integer() const;
   // The low 32 bits of integer().
   std::int32_t integer32() const { return static_cast<std::int32_t>(static_cast<std::uint64_t>(integer())); }
   double number() const;
 
-  // What "%@" prints: integers in decimal, booleans "1" and "0", doubles as textOf() below, texts as they are,
-  // dates as RFC 3339, arrays and maps as compact JSON.
+  // What "%@" prints: integers in decimal, booleans "1" and "0", doubles as textOf() below, texts as they
+  // are, dates as RFC 3339, arrays and maps as compact JSON.
   std::string text() const;
 
   // Roughly what it holds on the heap, in bytes, without the 16 of its own. O(1).
@@ -85,8 +85,8 @@ struct ValueMapEntry {
   Value value;
 };
 
-// The shortest digits that read back as the same double: fixed notation from 1e-4 to below 1e16, else as "1e+22",
-// without a trailing ".0" (2.0 is "2"); "nan", "inf", "-inf", "-0".
+// The shortest digits that read back as the same double: fixed notation from 1e-4 to below 1e16, else as
+// "1e+22", without a trailing ".0" (2.0 is "2"); "nan", "inf", "-inf", "-0".
 std::string textOf(double value);
 
 // What "%@" prints for a value that may be absent: "(null)" for null.

@@ -21,7 +21,8 @@ constexpr std::size_t kMostWithoutIndex = 16;
 // The entries in order, and above kMostWithoutIndex a hash table of their places with linear probing.
 struct ValueMap::Rep {
   std::vector<Entry> entries;
-  std::vector<std::uint32_t> slots;  // place + 1, 0 for none; a power of two at least twice the entries, or empty
+  std::vector<std::uint32_t>
+      slots;  // place + 1, 0 for none; a power of two at least twice the entries, or empty
   std::size_t bytes = 0;
 
   static std::size_t bytesOf(const Entry& entry) {

@@ -20,7 +20,8 @@ struct ValueMapEntry;
 // Value semantics by copy-on-write. Iteration gives insertion order; replacing a value keeps its key's place.
 //   copy                 a reference count, whatever the size
 //   look-up              up to 16 entries a walk over the keys, above that one hash probe
-//   set, first write     amortised O(1); on a map that shares its storage first a copy of n entries (reference
+//   set, first write     amortised O(1); on a map that shares its storage first a copy of n entries
+//   (reference
 //                        counts, no characters)
 //   erase                O(n), to keep the order
 //   merge of m entries   m look-ups and sets; into an empty map a reference count

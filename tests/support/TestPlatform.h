@@ -31,8 +31,8 @@ struct TestPlatform {
   TestPlatform& operator=(const TestPlatform&) = delete;
 
   Platform platform() {
-    return {log,    tracePoints, clock,       queues, timers, processes,
-            system, deviceFacts, preferences, files,  json,   metricon};
+    return {log,         tracePoints, clock, queues, timers,   processes, system,
+            deviceFacts, preferences, files, json,   metricon, "/logs"};
   }
 
   MemoryLog log;
