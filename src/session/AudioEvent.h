@@ -1,0 +1,40 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstdint>
+
+namespace tonewerk {
+
+// What part of the audio stack a message is about: a base category of 1 to 16 in the low half, a bit pattern
+// for the event domain that produced it, or nothing, in the high half.
+using AudioEventCategory = std::uint32_t;
+
+inline constexpr AudioEventCategory kCategoryGeneric = 1;
+inline constexpr AudioEventCategory kCategorySetup = 8;
+inline constexpr AudioEventCategory kCategoryError = 11;
+inline constexpr AudioEventCategory kCategoryVolume = 14;
+inline constexpr AudioEventCategory kCategoryUnknown = 0xFFFFFFFF;
+inline constexpr AudioEventCategory kDomainSession = 0x08000000;
+
+// What happened: 0 to 19, or unknown.
+using AudioEventType = std::uint16_t;
+
+inline constexpr AudioEventType kTypeGeneric = 0;
+inline constexpr AudioEventType kTypeStart = 1;
+inline constexpr AudioEventType kTypeStop = 2;
+inline constexpr AudioEventType kTypeError = 6;
+inline constexpr AudioEventType kTypeSummary = 11;
+inline constexpr AudioEventType kTypeUnknown = 65535;
+
+// What a session reports for: 0 to 13, or unknown.
+using AudioServiceType = std::uint16_t;
+
+inline constexpr AudioServiceType kServiceGeneric = 0;
+inline constexpr AudioServiceType kServiceStandalone = 5;
+inline constexpr AudioServiceType kServiceTest = 11;
+inline constexpr AudioServiceType kServiceUnknown = 65535;
+
+// A session's identifier, chosen by its client. 0 is no session, 1 the daemon's own single-message session.
+using ReporterID = std::int64_t;
+
+}  // namespace tonewerk

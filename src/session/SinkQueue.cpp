@@ -1,0 +1,33 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "session/SinkQueue.h"
+
+#include <utility>
+
+namespace tonewerk {
+
+SinkQueue::SinkQueue(std::unique_ptr<SerialQueue> queue) : queue_(std::move(queue)) {}
+
+SinkQueue::~SinkQueue() { queue_.reset(); }
+
+void SinkQueue::submit(std::size_t bytes, Task work) {
+  {
+    std::unique_lock lock(mutex_);
+    roomMade_.wait(lock, [&] { return waitingBytes_ == 0 || waitingBytes_ + bytes <= kMostWaitingBytes; });
+    waitingBytes_ += bytes;
+  }
+  queue_->async([this, bytes, work = std::move(work)]() mutable {
+    work();
+    work = nullptr;  // its memory goes before room is reported
+    finished(bytes);
+  });
+}
+
+void SinkQueue::drain() { queue_->drain(); }
+
+void SinkQueue::finished(std::size_t bytes) {
+  const std::lock_guard lock(mutex_);
+  waitingBytes_ -= bytes;
+  roomMade_.notify_all();
+}
+
+}  // namespace tonewerk

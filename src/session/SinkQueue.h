@@ -1,0 +1,40 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <condition_variable>
+#include <cstddef>
+#include <memory>
+#include <mutex>
+
+#include "platform/SerialQueue.h"
+
+namespace tonewerk {
+
+// A serial queue for a sink's slow work, bounded by the memory that waits on it.
+//
+// submit() waits while more than kMostWaitingBytes wait: the work queue then waits too, and through the
+// socket the clients do, so that nothing accepted is dropped. Destroying it runs what is queued.
+class SinkQueue {
+ public:
+  static constexpr std::size_t kMostWaitingBytes = std::size_t{64} << 20;
+
+  explicit SinkQueue(std::unique_ptr<SerialQueue> queue);
+  ~SinkQueue();
+
+  // Any thread but the queue's own. `bytes`: what `work` holds. A piece larger than the bound waits for an
+  // empty queue only.
+  void submit(std::size_t bytes, Task work);
+
+  // Returns when everything submitted before has run.
+  void drain();
+
+ private:
+  void finished(std::size_t bytes);
+
+  std::mutex mutex_;
+  std::condition_variable roomMade_;
+  std::size_t waitingBytes_ = 0;  // guarded by mutex_
+  std::unique_ptr<SerialQueue> queue_;
+};
+
+}  // namespace tonewerk

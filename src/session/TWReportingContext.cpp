@@ -1,0 +1,102 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "session/TWReportingContext.h"
+
+#include <atomic>
+#include <cassert>
+
+#include "platform/DeviceFacts.h"
+#include "session/TWReportingUtility.h"
+
+namespace tonewerk {
+namespace {
+
+constexpr std::string_view kSubsystem = "com.orvane.tonewerk";
+
+// The one global of the daemon.
+std::atomic<TWReportingContext*> currentContext = nullptr;
+
+constexpr AudioEventType kLastTypeWithText = 18;  // "MemoryLog" (19) is shown but not read back
+
+}  // namespace
+
+TWReportingContext::LogCategories::LogCategories(Log& log)
+    : client(log, kSubsystem, "twrc"),
+      serviceDelegate(log, kSubsystem, "twrs"),
+      session(log, kSubsystem, "twrr"),
+      linkReport(log, kSubsystem, "twri"),
+      driverUtility(log, kSubsystem, "twrd"),
+      trace(log, kSubsystem, "twrt"),
+      energybook(log, kSubsystem, "twrp"),
+      diagwire(log, kSubsystem, "twra"),
+      capsa(log, kSubsystem, "twrb"),
+      summary(log, kSubsystem, "twru"),
+      dp(log, kSubsystem, "twrl") {}
+
+TWReportingContext::TWReportingContext(const Platform& platform,
+                                       std::vector<const TWReportingSessionWorkerClass*> workerClasses)
+    : logCategories(platform.log), platform_(platform), workerClasses_(std::move(workerClasses)) {
+  [[maybe_unused]] TWReportingContext* before = currentContext.exchange(this);
+  assert(before == nullptr);
+}
+
+TWReportingContext::~TWReportingContext() {
+  reportingServerQueue_.reset();
+  fileSinkQueue_.reset();
+  currentContext = nullptr;
+}
+
+TWReportingContext& TWReportingContext::current() {
+  TWReportingContext* context = currentContext.load(std::memory_order_relaxed);
+  assert(context != nullptr);
+  return *context;
+}
+
+SerialQueue& TWReportingContext::reportingServerQueue() {
+  std::call_once(reportingServerQueueOnce_, [this] {
+    reportingServerQueue_ = platform_.queues.makeSerialQueue("com.orvane.tonewerk.reporting.server",
+                                                             QueuePriority::kUserInteractive);
+  });
+  return *reportingServerQueue_;
+}
+
+SinkQueue& TWReportingContext::fileSinkQueue() {
+  std::call_once(fileSinkQueueOnce_, [this] {
+    fileSinkQueue_ = std::make_unique<SinkQueue>(
+        platform_.queues.makeSerialQueue("com.orvane.tonewerk.reporting.files", QueuePriority::kUtility));
+  });
+  return *fileSinkQueue_;
+}
+
+bool TWReportingContext::isInternalBuild() {
+  std::call_once(internalBuildOnce_, [this] {
+    isInternalBuild_ = platform_.deviceFacts.boolean("InternalBuild").value_or(false);
+  });
+  return isInternalBuild_;
+}
+
+const TWReportingSessionWorkerRegistry& TWReportingContext::workerRegistry() {
+  std::call_once(workerRegistryOnce_, [this] { workerRegistry_.emplace(workerClasses_); });
+  return *workerRegistry_;
+}
+
+const TWReportingContext::Lookup& TWReportingContext::categoryLookup() {
+  std::call_once(categoryLookupOnce_, [this] {
+    for (AudioEventCategory category = 1; category <= 16; ++category) {
+      categoryLookup_[TWReportingUtilityCategoryString(category)] = category;
+    }
+    categoryLookup_["Unknown"] = kCategoryUnknown;
+  });
+  return categoryLookup_;
+}
+
+const TWReportingContext::Lookup& TWReportingContext::typeLookup() {
+  std::call_once(typeLookupOnce_, [this] {
+    for (AudioEventType type = 0; type <= kLastTypeWithText; ++type) {
+      typeLookup_[TWReportingUtilityTypeString(type)] = type;
+    }
+    typeLookup_["Unknown"] = kTypeUnknown;
+  });
+  return typeLookup_;
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,100 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <memory>
+#include <mutex>
+#include <optional>
+#include <string>
+#include <unordered_map>
+#include <vector>
+
+#include "platform/LogCategory.h"
+#include "platform/Platform.h"
+#include "platform/SerialQueue.h"
+#include "session/AudioEvent.h"
+#include "session/SinkQueue.h"
+#include "session/TWReportingNameTable.h"
+#include "session/TWReportingSessionWorkerRegistry.h"
+
+namespace tonewerk {
+
+// Everything of which there is one in the process: the platform's services, the work queue, the log
+// categories, the worker registry, the lookup tables, the internal-build answer. The entry point makes one
+// and each test makes one afresh; the free functions that take no argument find it through current().
+//
+// Any thread, unless a member says otherwise.
+class TWReportingContext {
+ public:
+  // `workerClasses`: all there are, in the registry's order. Becomes current().
+  TWReportingContext(const Platform& platform,
+                     std::vector<const TWReportingSessionWorkerClass*> workerClasses);
+  TWReportingContext(const TWReportingContext&) = delete;
+  TWReportingContext& operator=(const TWReportingContext&) = delete;
+  // Runs what is still queued on the queues made here.
+  ~TWReportingContext();
+
+  // There must be one.
+  static TWReportingContext& current();
+
+  const Platform& platform() const { return platform_; }
+
+  // The one serial queue that carries every request body, session and worker call. Made on first use.
+  SerialQueue& reportingServerQueue();
+
+  // Where sinks that write files do so, so that the work queue does not wait for a disk. Made on first use.
+  SinkQueue& fileSinkQueue();
+
+  // Asked of the device once.
+  bool isInternalBuild();
+
+  // Filled by the first session.
+  const TWReportingSessionWorkerRegistry& workerRegistry();
+
+  // On the work queue.
+  TWReportingNameTable& names() { return names_; }
+
+  // Values of the base categories' and the types' texts.
+  using Lookup = std::unordered_map<std::string, std::uint32_t>;
+  const Lookup& categoryLookup();
+  const Lookup& typeLookup();
+
+  struct LogCategories {
+    explicit LogCategories(Log& log);
+    LogCategory client;
+    LogCategory serviceDelegate;
+    LogCategory session;
+    LogCategory linkReport;
+    LogCategory driverUtility;
+    LogCategory trace;
+    LogCategory energybook;
+    LogCategory diagwire;
+    LogCategory capsa;
+    LogCategory summary;
+    LogCategory dp;
+  };
+  LogCategories logCategories;
+
+ private:
+  const Platform platform_;
+  TWReportingNameTable names_;
+
+  std::once_flag internalBuildOnce_;
+  bool isInternalBuild_ = false;
+
+  std::once_flag categoryLookupOnce_;
+  Lookup categoryLookup_;
+  std::once_flag typeLookupOnce_;
+  Lookup typeLookup_;
+
+  const std::vector<const TWReportingSessionWorkerClass*> workerClasses_;
+  std::once_flag workerRegistryOnce_;
+  std::optional<TWReportingSessionWorkerRegistry> workerRegistry_;
+
+  // Last, so that they end first: their work may use anything above. The work queue feeds the file sink.
+  std::once_flag fileSinkQueueOnce_;
+  std::unique_ptr<SinkQueue> fileSinkQueue_;
+  std::once_flag reportingServerQueueOnce_;
+  std::unique_ptr<SerialQueue> reportingServerQueue_;
+};
+
+}  // namespace tonewerk

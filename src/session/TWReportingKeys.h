@@ -1,0 +1,41 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <string_view>
+
+#include "values/SharedString.h"
+
+namespace tonewerk {
+
+// Keys of payloads and configurations. Those that every message carries are ready-made texts, so that setting
+// them allocates nothing.
+inline const SharedString TWReportingInternalEventEpochTime("twreporting_timestamp");
+inline const SharedString TWReportingMessageKeyTWTimestamp = TWReportingInternalEventEpochTime;
+inline const SharedString TWReportingInternalEventInvalidTimestamp("invalid_timestamp");
+inline const SharedString TWReportingInternalEventAudioTag("audiotag");
+inline const SharedString TWReportingApplicationName("HostApplicationDisplayID");
+inline const SharedString TWReportingMessageKeyIsSessionStarted("isSessionStarted");
+
+inline constexpr std::string_view TWReportingInternalEventProcessUptimeMS = "processuptime_ms";
+inline constexpr std::string_view TWReportingInternalEventSystemUptimeSec = "systemuptime_sec";
+inline constexpr std::string_view TWReportingQMApplicationName = "QMHostApplicationDisplayID";
+
+inline constexpr std::string_view TWReportingMessageKeySessionOutputRunning = "session_output_running";
+inline constexpr std::string_view TWReportingMessageKeySessionDuration = "session_duration";
+inline constexpr std::string_view TWReportingMessageKeySelectedFormat = "session_selected_format";
+inline constexpr std::string_view TWReportingMessageKeyActiveDevices = "active_devices";
+inline constexpr std::string_view TWReportingMessageKeyFormatID = "mFormatID";
+inline constexpr std::string_view TWReportingMessageKeySpatialAudioAccessoryFeature =
+    "spatial-audio-accessory-feature";
+inline constexpr std::string_view TWReportingMessageKeySpatializationEnabled = "spatializationEnabled";
+inline constexpr std::string_view TWReportingMessageKeyRingerState = "ringerstate";
+inline constexpr std::string_view TWReportingMessageKeyChannelsPerFrame = "mChannelsPerFrame";
+inline constexpr std::string_view TWReportingMessageKeyVolume = "QMSessionVolume";
+inline constexpr std::string_view TWReportingMessageKeyVolumeBucketed = "QMSessionVolumeBucketed";
+inline constexpr std::string_view TWReportingMessageKeyPlayseconds = "play_seconds";
+inline constexpr std::string_view TWReportingMessageKeyPlaysecondsBucketed = "play_secondsBucketed";
+inline constexpr std::string_view TWReportingMessageKeyMessageIndex = "msgidx";
+inline constexpr std::string_view TWReportingMessageKeyMessageCount = "msgcnt";
+inline constexpr std::string_view TWReportingMessageKeyIssueType = "issue_type";
+
+}  // namespace tonewerk

@@ -1,0 +1,36 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstddef>
+#include <unordered_map>
+#include <vector>
+
+#include "session/AudioEvent.h"
+#include "values/SharedString.h"
+
+namespace tonewerk {
+
+// Names that are made out of a message's category and type and a session's service, each composed once.
+//
+// Bounded whatever clients send: categories, types and services without a text of their own share one place.
+// On the work queue.
+class TWReportingNameTable {
+ public:
+  TWReportingNameTable();
+
+  // The category's text followed by the type's, as "PlaybackStart".
+  const SharedString& audioTag(AudioEventCategory category, AudioEventType type);
+
+  // "com.orvane.tonewerk.<category>.<type>" and "com.orvane.<service>.<category>.<type>".
+  struct EventNames {
+    SharedString ofTonewerk;
+    SharedString ofService;
+  };
+  const EventNames& eventNames(AudioEventCategory category, AudioEventType type, AudioServiceType service);
+
+ private:
+  std::vector<SharedString> audioTags_;
+  std::unordered_map<std::size_t, EventNames> eventNames_;
+};
+
+}  // namespace tonewerk

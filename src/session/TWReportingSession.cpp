@@ -1,0 +1,384 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "session/TWReportingSession.h"
+
+#include <algorithm>
+
+#include "platform/Clock.h"
+#include "platform/LogLine.h"
+#include "session/TWReportingContext.h"
+#include "session/TWReportingKeys.h"
+#include "session/TWReportingTracePoint.h"
+#include "session/TWReportingUtility.h"
+
+namespace tonewerk {
+namespace {
+
+constexpr double kOldestTimestampSeconds = 31'536'000.0;  // 365 days
+
+// What a stored message takes beside its payload: the record and its places in the list and among the newest.
+constexpr std::size_t kRecordBytes = sizeof(TWReportingSessionMessage) + 64;
+
+const Value kUnknownName("Unknown");
+const Value kNilText("nil");
+
+std::string_view yesOrNo(bool answer) { return answer ? "YES" : "NO"; }
+
+bool contains(const std::vector<const TWReportingSessionWorkerClass*>& classes,
+              const TWReportingSessionWorkerClass& wanted) {
+  return std::find(classes.begin(), classes.end(), &wanted) != classes.end();
+}
+
+}  // namespace
+
+std::shared_ptr<TWReportingSession> TWReportingSession::initWithID(ReporterID reporterID,
+                                                                   ProcessIdentifiers processIdentifiers,
+                                                                   std::shared_ptr<KeptBytesBudget> budget) {
+  const auto& registry = TWReportingContext::current().workerRegistry();
+  if (budget == nullptr) budget = std::make_shared<KeptBytesBudget>();
+  auto session = std::make_shared<TWReportingSession>(Private(), reporterID, std::move(processIdentifiers),
+                                                      std::move(budget));
+  session->startWorkersFromClasses(registry.startOnInitClasses());
+  infoLog(TWReportingSessionCategory(), "created reporting session for ID: %lli", reporterID);
+  emitTracePoint(TWReportingTracePoint::kSessionCreated);
+  return session;
+}
+
+TWReportingSession::TWReportingSession(Private, ReporterID reporterID, ProcessIdentifiers processIdentifiers,
+                                       std::shared_ptr<KeptBytesBudget> budget)
+    : reporterID_(reporterID),
+      processIdentifiers_(std::move(processIdentifiers)),
+      budget_(std::move(budget)),
+      serviceName_(TWReportingUtilityGenerateServiceNameFromServiceType(kServiceUnknown)) {}
+
+TWReportingSession::~TWReportingSession() {
+  emitTracePoint(TWReportingTracePoint::kSessionReleased);
+  infoLog(TWReportingSessionCategory(), "deallocing this session %lli", reporterID_);
+  budget_->give(messageBytes_ + configuration_.bytes() + previousValues_.bytes());
+}
+
+void TWReportingSession::setServiceType(AudioServiceType serviceType) {
+  serviceType_ = serviceType;
+  serviceName_ = TWReportingUtilityGenerateServiceNameFromServiceType(serviceType);
+  infoLog(TWReportingSessionCategory(), "setting service type %@", serviceName_);
+}
+
+bool TWReportingSession::updateConfigurationWithContentsOfConfiguration(const ValueMap* configuration) {
+  if (configuration == nullptr) return true;
+  ValueMap update;
+  if (const Value* name = configuration->find(TWReportingQMApplicationName)) {
+    update.set(TWReportingApplicationName, *name);
+  }
+  update.merge(*configuration);
+  return mergeWithinBudget(configuration_, update);
+}
+
+void TWReportingSession::start() {
+  store(lifecycleMessage(kTypeStart, "start"));
+  infoLog(TWReportingSessionCategory(), "start called. reporterID=%lli", reporterID_);
+  if (started_) {
+    infoLog(TWReportingSessionCategory(), "%lli is already started", reporterID_);
+    return;
+  }
+  debugLog(TWReportingSessionCategory(), "self.started==false. starting. reporterID=%lli", reporterID_);
+  started_ = true;
+  emitTracePoint(TWReportingTracePoint::kSessionStarted);
+  startWorkersFromClasses(TWReportingContext::current().workerRegistry().validClasses());
+}
+
+void TWReportingSession::startWorkersFromClasses(
+    const std::vector<const TWReportingSessionWorkerClass*>& classes) {
+  for (const TWReportingSessionWorkerClass* workerClass : classes) makeWorker(*workerClass);
+  for (const auto& worker : workersInOrder(Order::kConsumersFirst)) {
+    if (!worker->started) startWorker(*worker);
+  }
+}
+
+void TWReportingSession::makeWorker(const TWReportingSessionWorkerClass& workerClass) {
+  if (isSingleMessageSession_ && !workerClass.handleSingleMessageSession) {
+    debugLog(TWReportingSessionCategory(),
+             "Skipping TWReportingSessionWorker for single message session. action=skipped worker=%@ "
+             "reporterID=%lli",
+             workerClass, reporterID_);
+    return;
+  }
+  if (contains(initializedWorkerClasses_, workerClass)) {
+    debugLog(TWReportingSessionCategory(),
+             "TWReportingSessionWorker already initialized. action=skipped worker=%@ reporterID=%lli",
+             workerClass, reporterID_);
+    return;
+  }
+  debugLog(TWReportingSessionCategory(),
+           "Initializing TWReportingSessionWorker. action=init worker=%@ reporterID=%lli", workerClass,
+           reporterID_);
+  const auto worker = workerClass.initWithSession(shared_from_this());
+  if (worker == nullptr) {
+    // Not remembered: a later start tries again, as the service type may have changed by then.
+    debugLog(TWReportingSessionCategory(),
+             "TWReportingSessionWorker failed to initialize. action=failure worker=%@ reporterID=%lli",
+             workerClass, reporterID_);
+    return;
+  }
+  {
+    const std::lock_guard lock(propertiesMutex_);
+    initializedWorkerClasses_.push_back(&workerClass);
+    messageWorkers_.push_back(worker);
+    if (workerClass.isConsumer) consumingMessageWorkers_.push_back(worker);
+    if (workerClass.isProducer) producingMessageWorkers_.push_back(worker);
+  }
+  if (workerClass.isConsumer) {
+    consumers_.push_back(std::dynamic_pointer_cast<TWReportingSessionWorkerConsumerProtocol>(worker));
+  }
+  debugLog(TWReportingSessionCategory(), "TWReportingSessionWorker action=added worker=%@ reporterID=%lli",
+           workerClass, reporterID_);
+}
+
+void TWReportingSession::startWorker(TWReportingSessionWorkerProtocol& worker) {
+  const std::optional<bool> result = worker.start();
+  worker.started = result.value_or(true);
+  if (!result) return;
+  debugLog(TWReportingSessionCategory(),
+           "TWReportingSessionWorker action=start worker=%@ started=%@ reporterID=%lli", worker.workerClass(),
+           yesOrNo(worker.started), reporterID_);
+}
+
+// Each worker once, at its first place.
+TWReportingSession::Workers TWReportingSession::workersInOrder(Order order) const {
+  const bool consumersFirst = order == Order::kConsumersFirst;
+  Workers ordered = consumersFirst ? consumingMessageWorkers_ : producingMessageWorkers_;
+  const auto addMissing = [&ordered](const Workers& more) {
+    for (const auto& worker : more) {
+      if (std::find(ordered.begin(), ordered.end(), worker) == ordered.end()) ordered.push_back(worker);
+    }
+  };
+  addMissing(consumersFirst ? producingMessageWorkers_ : consumingMessageWorkers_);
+  addMissing(messageWorkers_);
+  return ordered;
+}
+
+void TWReportingSession::sendMessage(const std::shared_ptr<TWReportingSessionMessage>& message,
+                                     const MessageReply& reply) {
+  ++totalMessageCount_;
+  addMissingDates(*message);
+  removeWhiteSpaceFromKeys(*message);
+  addAudioMessageTag(*message);
+  addAppName(*message);
+  emitTracePoint(TWReportingTracePoint::kMessageReceived);
+  message->isSessionStarted = started_;
+  message->isRedundant = messageIsRedundant(*message);
+  debugLog(
+      TWReportingSessionCategory(),
+      "TWReportingSessionWorker action=sendMessage reporterID=%lli app=%@ redundant=%@ message=%@",
+      reporterID_, [&] { return TWReportingUtilityRetrieveAppName(configuration_).string(); },
+      yesOrNo(message->isRedundant), *message);
+  if (!mergeWithinBudget(previousValues_, message->message)) noteUnkept();
+  if (!message->isRedundant) store(message);
+  deliver(*message);
+  if (reply) reply(std::nullopt);
+}
+
+void TWReportingSession::deliver(const TWReportingSessionMessage& message) {
+  for (std::size_t at = 0; at < consumers_.size();
+       ++at) {  // by place: a worker may send, or start the session
+    const Consumer worker = consumers_[at];
+    if (!worker->started) continue;
+    if (message.isRedundant && !worker->handleRedundantMessages()) continue;
+    const TWReportingSessionWorkerClass& workerClass = worker->workerClass();
+    if (!message.destinationWorkers.empty() && !contains(message.destinationWorkers, workerClass)) continue;
+    worker->handleMessage(message);
+    debugLog(TWReportingSessionCategory(),
+             "TWReportingSessionWorker action=handleMessage worker=%@ reporterID=%lli", workerClass,
+             reporterID_);
+  }
+}
+
+void TWReportingSession::stop() {
+  store(lifecycleMessage(kTypeStop, "stop"));
+  debugLog(TWReportingSessionCategory(), "stop called. reporterID=%lli", reporterID_);
+  if (!started_) return;
+  debugLog(TWReportingSessionCategory(), "ending session. reporterID=%lli", reporterID_);
+  emitTracePoint(TWReportingTracePoint::kSessionEnding);
+  TWReportingSessionMessage::sortMessages(messages_);
+  newest_.clear();
+  for (const auto& message : messages_) rememberAsNewest(*message);
+
+  for (const auto& worker : workersInOrder(Order::kProducersFirst)) {
+    if (!worker->started) continue;
+    worker->stop();
+    worker->started = false;
+    debugLog(TWReportingSessionCategory(), "TWReportingSessionWorker action=stop worker=%@ reporterID=%lli",
+             worker->workerClass(), reporterID_);
+  }
+  forgetMessages();
+  totalMessageCount_ = 0;
+  started_ = false;
+}
+
+std::shared_ptr<TWReportingSessionMessage> TWReportingSession::lifecycleMessage(
+    AudioEventType type, const std::string& method) const {
+  const std::uint64_t count = messages_.size();
+  ValueMap payload{{"method", method},
+                   {"messages_at_" + method, count},
+                   {"unique_messages_at_" + method, count},
+                   {"reporterid", reporterID_},
+                   {"running_at_" + method, yesOrNo(started_)}};
+  auto message = std::make_shared<TWReportingSessionMessage>(std::move(payload), kCategorySetup, type);
+  addMissingDates(*message);
+  addAudioMessageTag(*message);
+  return message;
+}
+
+void TWReportingSession::store(const std::shared_ptr<TWReportingSessionMessage>& message) {
+  const std::size_t bytes = kRecordBytes + message->message.bytes();
+  if (!budget_->take(bytes)) {
+    noteUnkept();
+    return;
+  }
+  messageBytes_ += bytes;
+  messages_.push_back(message);
+  rememberAsNewest(*message);
+}
+
+void TWReportingSession::rememberAsNewest(const TWReportingSessionMessage& message) {
+  newest_[{message.category, message.type}] = &message;
+}
+
+bool TWReportingSession::mergeWithinBudget(ValueMap& map, const ValueMap& more) {
+  // A merge adds at most what it merges; what it replaced is given back.
+  const std::size_t before = map.bytes();
+  if (!budget_->take(more.bytes())) return false;
+  const std::lock_guard lock(propertiesMutex_);
+  map.merge(more);
+  budget_->give(before + more.bytes() - map.bytes());
+  return true;
+}
+
+void TWReportingSession::noteUnkept() {
+  ++unkeptMessageCount_;
+  if (!budget_->isFirstRefusal()) return;
+  errorLog(
+      TWReportingSessionCategory(),
+      "the client's sessions keep %zu bytes, the most is %zu: further messages are delivered but not kept. "
+      "reporterID=%lli",
+      budget_->used(), budget_->most(), reporterID_);
+}
+
+void TWReportingSession::forgetMessages() {
+  if (unkeptMessageCount_ > 0) {
+    errorLog(TWReportingSessionCategory(), "messages delivered but not kept: count=%lu reporterID=%lli",
+             unkeptMessageCount_, reporterID_);
+    unkeptMessageCount_ = 0;
+  }
+  newest_.clear();
+  messages_.clear();
+  messages_.shrink_to_fit();
+  budget_->give(messageBytes_);
+  messageBytes_ = 0;
+}
+
+void TWReportingSession::addMissingDates(TWReportingSessionMessage& message) {
+  const double now = TWReportingContext::current().platform().clock.now();
+  const Value* timestamp = message.message.find(TWReportingInternalEventEpochTime);
+  const bool isTooOld = timestamp != nullptr && timestamp->number() < now - kOldestTimestampSeconds;
+  if (timestamp != nullptr && !isTooOld) return;
+  const Value invalid = timestamp == nullptr ? kNilText : *timestamp;
+  message.message.set(TWReportingInternalEventInvalidTimestamp, invalid);
+  message.message.set(TWReportingInternalEventEpochTime, now);
+}
+
+void TWReportingSession::removeWhiteSpaceFromKeys(TWReportingSessionMessage& message) {
+  std::vector<ValueMap::Entry> spaced;
+  for (const ValueMap::Entry& entry : message.message) {
+    if (entry.key.view().find(' ') != std::string_view::npos) spaced.push_back(entry);
+  }
+  for (const ValueMap::Entry& entry : spaced) {
+    std::string repaired = entry.key.string();
+    std::replace(repaired.begin(), repaired.end(), ' ', '_');
+    message.message.set(repaired, entry.value);
+  }
+  for (const ValueMap::Entry& entry : spaced) message.message.erase(entry.key);
+}
+
+void TWReportingSession::addAudioMessageTag(TWReportingSessionMessage& message) {
+  message.message.set(TWReportingInternalEventAudioTag,
+                      TWReportingContext::current().names().audioTag(message.category, message.type));
+}
+
+void TWReportingSession::addAppName(TWReportingSessionMessage& message) const {
+  const std::lock_guard lock(message);
+  const Value* name = message.message.find(TWReportingApplicationName);
+  if (name != nullptr && !(*name == kUnknownName)) return;
+  message.message.set(TWReportingApplicationName, TWReportingUtilityRetrieveAppName(configuration_));
+}
+
+bool TWReportingSession::messageIsRedundant(const TWReportingSessionMessage& message) const {
+  if (message.type == kTypeError || message.category == kCategoryError) return false;
+  const auto earlier = newest_.find({message.category, message.type});
+  if (earlier == newest_.end()) return false;
+  const bool isRepeated = message.message.equalsIgnoring(
+      earlier->second->message, {TWReportingInternalEventProcessUptimeMS,
+                                 TWReportingInternalEventSystemUptimeSec, TWReportingInternalEventEpochTime});
+  if (isRepeated) debugLog(TWReportingSessionCategory(), "marking event redundant");
+  return isRepeated;
+}
+
+const std::vector<const TWReportingSessionWorkerClass*>& TWReportingSession::getAllWorkerClasses() {
+  return TWReportingContext::current().workerRegistry().allClasses();
+}
+
+std::optional<std::string> TWReportingSession::clientProcessName() const {
+  const std::lock_guard lock(propertiesMutex_);
+  return clientProcessName_;
+}
+
+void TWReportingSession::setClientProcessName(std::optional<std::string> name) {
+  const std::lock_guard lock(propertiesMutex_);
+  clientProcessName_ = std::move(name);
+}
+
+ValueMap TWReportingSession::configuration() const {
+  const std::lock_guard lock(propertiesMutex_);
+  return configuration_;
+}
+
+ValueMap TWReportingSession::previousValues() const {
+  const std::lock_guard lock(propertiesMutex_);
+  return previousValues_;
+}
+
+void TWReportingSession::addPreviousValues(const ValueMap& values) {
+  if (!mergeWithinBudget(previousValues_, values)) noteUnkept();
+}
+
+TWReportingSession::Workers TWReportingSession::messageWorkers() const {
+  const std::lock_guard lock(propertiesMutex_);
+  return messageWorkers_;
+}
+
+TWReportingSession::Workers TWReportingSession::consumingMessageWorkers() const {
+  const std::lock_guard lock(propertiesMutex_);
+  return consumingMessageWorkers_;
+}
+
+TWReportingSession::Workers TWReportingSession::producingMessageWorkers() const {
+  const std::lock_guard lock(propertiesMutex_);
+  return producingMessageWorkers_;
+}
+
+std::vector<const TWReportingSessionWorkerClass*> TWReportingSession::initializedWorkerClasses() const {
+  const std::lock_guard lock(propertiesMutex_);
+  return initializedWorkerClasses_;
+}
+
+std::string TWReportingSession::description() const {
+  const Value* noName = nullptr;
+  const std::optional<std::string> clientName = clientProcessName();
+  const std::int32_t ownerPid = processIdentifiers_.empty() ? 0 : processIdentifiers_.front();
+  return "reporterID=" + std::to_string(reporterID_) + ",serviceName=" + serviceName_ +
+         ",ownerPid=" + std::to_string(ownerPid) +
+         ",clientProcessName=" + clientName.value_or(textOf(noName)) +
+         ",HostApplicationDisplayID=" + TWReportingUtilityRetrieveAppName(configuration()).string() +
+         ",started=" + std::to_string(started_ ? 1 : 0) +
+         ",singleMessageSession=" + std::to_string(isSingleMessageSession_ ? 1 : 0);
+}
+
+}  // namespace tonewerk

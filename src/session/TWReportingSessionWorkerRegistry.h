@@ -1,0 +1,33 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <vector>
+
+#include "session/TWReportingSessionWorkerClass.h"
+
+namespace tonewerk {
+
+// The process's worker classes by what they are. Filled once, then only read, on any thread.
+class TWReportingSessionWorkerRegistry {
+ public:
+  using Classes = std::vector<const TWReportingSessionWorkerClass*>;
+
+  // Sorts `all` out; a class whose instances cannot be made is logged and left out of every list but
+  // allClasses().
+  explicit TWReportingSessionWorkerRegistry(Classes all);
+
+  const Classes& allClasses() const { return all_; }
+  const Classes& validClasses() const { return valid_; }
+  const Classes& consumerClasses() const { return consumers_; }
+  const Classes& producerClasses() const { return producers_; }
+  const Classes& startOnInitClasses() const { return startOnInit_; }
+
+ private:
+  Classes all_;
+  Classes valid_;
+  Classes consumers_;
+  Classes producers_;
+  Classes startOnInit_;
+};
+
+}  // namespace tonewerk
