@@ -1,0 +1,22 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "workers/TWReportingWorkerClasses.h"
+
+#include "workers/producers/TWReportingSessionVolumeMessagesWorker.h"
+#include "workers/sinks/TWReportingSessionMetriconWorker.h"
+#include "workers/sinks/TWReportingSessionSummaryJsonFileWorker.h"
+#include "workers/sinks/TWReportingSessionSummaryWorker.h"
+
+namespace tonewerk {
+
+// The JSON file worker is neither producer nor consumer, so it stops after both and finds what they added.
+// The orientation producer is left out on purpose: it cannot be made.
+std::vector<const TWReportingSessionWorkerClass*> allWorkerClasses() {
+  return {
+      &TWReportingSessionVolumeMessagesWorker::kWorkerClass,
+      &TWReportingSessionSummaryWorker::kWorkerClass,
+      &TWReportingSessionMetriconWorker::kWorkerClass,
+      &TWReportingSessionSummaryJsonFileWorker::kWorkerClass,
+  };
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,22 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <memory>
+
+#include "session/TWReportingSessionWorkerClass.h"
+
+namespace tonewerk {
+
+// Would derive messages on how the device was held. Switched off: no session gets one, and it is in no
+// registry.
+class TWReportingSessionOrientationMessagesWorker final : public TWReportingSessionWorkerProducerProtocol {
+ public:
+  static const TWReportingSessionWorkerClass kWorkerClass;
+  const TWReportingSessionWorkerClass& workerClass() const override { return kWorkerClass; }
+
+  // Always null; keeps no reference to the session.
+  static std::shared_ptr<TWReportingSessionOrientationMessagesWorker> initWithSession(
+      const std::shared_ptr<TWReportingSession>& session);
+};
+
+}  // namespace tonewerk

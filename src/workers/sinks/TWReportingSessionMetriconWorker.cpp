@@ -1,0 +1,26 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "workers/sinks/TWReportingSessionMetriconWorker.h"
+
+#include "platform/Metricon.h"
+#include "session/TWReportingContext.h"
+#include "session/TWReportingSession.h"
+
+namespace tonewerk {
+
+const TWReportingSessionWorkerClass TWReportingSessionMetriconWorker::kWorkerClass =
+    workerClassOf<TWReportingSessionMetriconWorker>("TWReportingSessionMetriconWorker");
+
+bool TWReportingSessionMetriconWorker::handleMessage(const TWReportingSessionMessage& message) {
+  TWReportingContext& context = TWReportingContext::current();
+  Metricon& metricon = context.platform().metricon;
+  const auto owner = session.lock();
+  const AudioServiceType service = owner == nullptr ? kServiceGeneric : owner->serviceType();
+  const auto& names = context.names().eventNames(message.category, message.type, service);
+  const UniqueFunction<ValueMap()> payload = [&message] { return message.message; };
+  for (const SharedString* name : {&names.ofTonewerk, &names.ofService}) {
+    if (metricon.isEventUsed(*name)) metricon.sendEvent(*name, payload);
+  }
+  return false;
+}
+
+}  // namespace tonewerk
