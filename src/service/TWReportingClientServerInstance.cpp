@@ -1,0 +1,295 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "service/TWReportingClientServerInstance.h"
+
+#include <algorithm>
+#include <utility>
+#include <vector>
+
+#include "platform/LogLine.h"
+#include "platform/SerialQueue.h"
+#include "service/TWReportingServiceDelegateProtocol.h"
+#include "session/TWReportingSession.h"
+#include "session/TWReportingSessionMessage.h"
+#include "session/TWReportingTracePoint.h"
+#include "session/TWReportingUtility.h"
+
+namespace tonewerk {
+namespace {
+
+constexpr std::string_view kReportingErrorDomain = "com.orvane.audio.reporting";
+constexpr std::int64_t kReportingDisabled = 1;
+constexpr std::string_view kSendSingleMessage = "sendSingleMessage";
+
+const auto category = &TWReportingServiceDelegateCategory;
+
+ReplyError overBudget(const KeptBytesBudget& budget) {
+  return messagingError(kOverLimit, "the connection's sessions keep " + std::to_string(budget.used()) +
+                                        " bytes, the most is " + std::to_string(budget.most()));
+}
+
+}  // namespace
+
+TWReportingClientServerInstance::TWReportingClientServerInstance(
+    std::int32_t processIdentifier, std::weak_ptr<TWReportingServiceDelegateProtocol> delegate)
+    : processIdentifier_(processIdentifier),
+      delegate_(std::move(delegate)),
+      budget_(std::make_shared<KeptBytesBudget>()) {
+  infoLog(category(), "new client with pid %lu", processIdentifier);
+}
+
+TWReportingClientServerInstance::~TWReportingClientServerInstance() {
+  infoLog(category(), "dealloc %i from the server client list", processIdentifier_);
+}
+
+template <typename Body>
+void TWReportingClientServerInstance::onWorkQueue(ServiceRequest request, Body body) {
+  TWReportingUtilityGetReportingServerQueue().async(
+      [self = shared_from_this(), request = std::move(request), body = std::move(body)]() mutable {
+        if (const Delegate delegate = self->delegate_.lock()) body(*self, *delegate, request.reply);
+      });
+}
+
+void TWReportingClientServerInstance::createReportingSession(ReporterID reporterID, ServiceRequest request) {
+  onWorkQueue(std::move(request), [reporterID](auto& self, auto&, const Reply& reply) {
+    emitTracePoint(TWReportingTracePoint::kRequestCreate);
+    debugLog(category(), "creating session for reporter %lli", reporterID);
+    SessionMap& sessions = self.clientReportingSessionMap_;
+    if (sessions.size() >= kMostSessions && !sessions.contains(reporterID)) {
+      return reply(messagingError(kOverLimit, "the connection holds " + std::to_string(sessions.size()) +
+                                                  " sessions, the most there may be"));
+    }
+    // A session that stood there is dropped without a stop: its client has given it up.
+    const Session session = self.makeSession(reporterID);
+    session->setClientProcessName(self.clientProcessName());
+    sessions[reporterID] = session;
+    infoLog(category(), "session created for reporter %lli", reporterID);
+    reply(std::nullopt, true);
+  });
+}
+
+void TWReportingClientServerInstance::setServiceType(AudioServiceType serviceType,
+                                                     ReporterID reportingSession, ServiceRequest request) {
+  onWorkQueue(std::move(request), [serviceType, reportingSession](auto& self, auto&, const Reply& reply) {
+    debugLog(category(), "setting service type %i for reporter %lli", serviceType, reportingSession);
+    if (const Session session = self.ownSession(reportingSession)) {
+      if (!self.changeServiceType(serviceType, session)) return reply(overBudget(*self.budget_));
+      debugLog(category(), "service type %i set for reporter  %lli", serviceType, reportingSession);
+    }
+    reply(std::nullopt, true);
+  });
+}
+
+// A session reports for one service: another type makes another session, not started, with what the first was
+// told.
+bool TWReportingClientServerInstance::changeServiceType(AudioServiceType serviceType,
+                                                        const Session& session) {
+  if (session->serviceType() == serviceType) {
+    session->setServiceType(serviceType);
+    return true;
+  }
+  const ValueMap configuration = session->configuration();
+  const ValueMap previousValues = session->previousValues();
+  if (!budget_->hasRoomFor(configuration.bytes() + previousValues.bytes())) return false;
+  const Session replacement = makeSession(session->reporterID());
+  replacement->updateConfigurationWithContentsOfConfiguration(&configuration);
+  replacement->addPreviousValues(previousValues);
+  replacement->setServiceType(serviceType);
+  clientReportingSessionMap_[session->reporterID()] = replacement;
+  return true;
+}
+
+void TWReportingClientServerInstance::getServiceNameForReporterID(ReporterID reporterID,
+                                                                  ServiceRequest request) {
+  onWorkQueue(std::move(request), [reporterID](auto& self, auto&, const Reply& reply) {
+    debugLog(category(), "fetching seviceType");
+    // Identifier 0 is answered twice; clients have come to count on the first.
+    if (reporterID == 0) reply(std::nullopt, kServiceUnknown);
+    const Session session = self.findReportingSessionForID(reporterID, true);
+    const AudioServiceType serviceType = session == nullptr ? kServiceUnknown : session->serviceType();
+    debugLog(category(), "returning service type %i for reporter  %lli", serviceType, reporterID);
+    reply(std::nullopt, serviceType);
+  });
+}
+
+void TWReportingClientServerInstance::setConfiguration(ValueMap configuration, ReporterID reporterID,
+                                                       ServiceRequest request) {
+  onWorkQueue(std::move(request), [configuration = std::move(configuration), reporterID](auto& self, auto&,
+                                                                                         const Reply& reply) {
+    debugLog(category(), "setting configuration");
+    const Session session = self.findReportingSessionForID(reporterID, false);
+    if (session != nullptr && !session->updateConfigurationWithContentsOfConfiguration(&configuration)) {
+      return reply(overBudget(*self.budget_));
+    }
+    reply(std::nullopt, true);
+  });
+}
+
+void TWReportingClientServerInstance::startReportingSessionForID(ReporterID reporterID,
+                                                                 ServiceRequest request) {
+  onWorkQueue(std::move(request), [reporterID](auto& self, auto& delegate, const Reply& reply) {
+    emitTracePoint(TWReportingTracePoint::kRequestStart);
+    debugLog(category(), "starting session for reporter %lli", reporterID);
+    const Session session = self.ownSession(reporterID);
+    if (session == nullptr) return reply(std::nullopt, true);
+    if (session->started()) return;  // unanswered on purpose: the first start's answer speaks for both
+    session->start();
+    if (session->transactionCompleteBlock) session->transactionCompleteBlock(std::nullopt, true);
+    session->transactionCompleteBlock = [reply](const std::optional<ReplyError>& error, bool success) {
+      reply(error, success);
+    };
+    if (session->serviceType() == kServiceTest && TWReportingUtilityIsInternalBuild())
+      reply(std::nullopt, true);
+    delegate.logReportingSessions();
+  });
+}
+
+void TWReportingClientServerInstance::sendMessage(ValueMap message, AudioEventCategory messageCategory,
+                                                  AudioEventType type, ReporterIDs reporterIDs,
+                                                  ServiceRequest request) {
+  if (!reporterIDs || reporterIDs->empty()) {
+    const Delegate delegate = delegate_.lock();
+    if (delegate != nullptr && delegate->isReportingEnabled() && TWReportingUtilityIsInternalBuild()) {
+      message.set(kSendSingleMessage, true);
+    }
+  }
+  onWorkQueue(std::move(request),
+              [message = std::move(message), messageCategory, type, reporterIDs = std::move(reporterIDs)](
+                  auto&, auto& delegate, const Reply& reply) mutable {
+                emitTracePoint(TWReportingTracePoint::kRequestSend);
+                debugLog(category(), "sending message for reporter %@", reporterIDs);
+                if (!delegate.isReportingEnabled()) {
+                  return reply(ReplyError{std::string(kReportingErrorDomain), kReportingDisabled, ""});
+                }
+                const std::vector<Session> sessions = delegate.findReportingSessionsForIDs(reporterIDs);
+                for (std::size_t at = 0; at < sessions.size(); ++at) {
+                  // The last one gets the payload itself: it need not be copied to be changed.
+                  ValueMap payload = at + 1 == sessions.size() ? std::move(message) : message;
+                  sessions[at]->sendMessage(
+                      std::make_shared<TWReportingSessionMessage>(std::move(payload), messageCategory, type));
+                }
+                reply(std::nullopt);
+              });
+}
+
+void TWReportingClientServerInstance::stopReportingSessionForID(ReporterID reporterID,
+                                                                ServiceRequest request) {
+  onWorkQueue(std::move(request), [reporterID](auto& self, auto& delegate, const Reply& reply) {
+    emitTracePoint(TWReportingTracePoint::kRequestStop);
+    debugLog(category(), "stopping session for reporter %lli", reporterID);
+    if (reporterID == 0) return reply(std::nullopt, true);
+    const Session session = self.ownSession(reporterID);
+    if (session != nullptr && session->started()) {
+      session->stop();
+      if (session->transactionCompleteBlock) session->transactionCompleteBlock(std::nullopt, true);
+      session->transactionCompleteBlock = nullptr;
+      delegate.logReportingSessions();
+    } else {
+      debugLog(category(),
+               "Stop called, but session==nil or session.started==false. reporterID=%lli session=%@ "
+               "session.started=%i",
+               reporterID, session, session != nullptr && session->started());
+    }
+    debugLog(category(), "stopping %lli", reporterID);
+    reply(std::nullopt, true);
+  });
+}
+
+void TWReportingClientServerInstance::destroyReportingSession(ReporterID reporterID, ServiceRequest request) {
+  onWorkQueue(std::move(request), [reporterID](auto& self, auto& delegate, const Reply& reply) {
+    emitTracePoint(TWReportingTracePoint::kRequestDestroy);
+    debugLog(category(), "destroying session for reporter %lli", reporterID);
+    if (reporterID == 0) return reply(std::nullopt, true);
+    if (const Session session = self.ownSession(reporterID)) {
+      if (session->started()) session->stop();
+      self.clientReportingSessionMap_.erase(reporterID);
+    }
+    debugLog(category(), "destroying %lli", reporterID);
+    delegate.logReportingSessions();
+    reply(std::nullopt, true);
+  });
+}
+
+void TWReportingClientServerInstance::reporterIDValid(ReporterID reporterID, ServiceRequest request) {
+  onWorkQueue(std::move(request), [reporterID](auto& self, auto&, const Reply& reply) {
+    debugLog(category(), "validating reporter %lli", reporterID);
+    ValueMap validity{{TWReporterProxyKeyReporterID, 0}, {TWReporterProxyKeyServiceType, kServiceUnknown}};
+    if (const Session session = self.findReportingSessionForID(reporterID, true)) {
+      validity.set(TWReporterProxyKeyReporterID, reporterID);
+      validity.set(TWReporterProxyKeyServiceType, session->serviceType());
+    }
+    defaultLog(category(), "validating reporter %lli", reporterID);
+    reply(std::nullopt, validity);
+  });
+}
+
+void TWReportingClientServerInstance::getAllReporters(ServiceRequest request) {
+  onWorkQueue(std::move(request), [](auto&, auto& delegate, const Reply& reply) {
+    std::vector<Value> reporters;
+    for (const auto& client : delegate.getAllClients()) {
+      for (const auto& entry : client->clientReportingSessionMap_) reporters.emplace_back(entry.first);
+    }
+    reply(std::nullopt, ValueArray(std::move(reporters)));
+  });
+}
+
+void TWReportingClientServerInstance::killService() {
+  defaultLog(category(), "DESTROYING SERVICE");
+  if (const Delegate delegate = delegate_.lock()) delegate->endProcess();
+}
+
+TWReportingClientServerInstance::Session TWReportingClientServerInstance::findReportingSessionForID(
+    ReporterID reporterID, bool acrossAllClients) {
+  const auto own = clientReportingSessionMap_.find(reporterID);
+  if (own != clientReportingSessionMap_.end()) return own->second;
+  const Delegate delegate = acrossAllClients ? delegate_.lock() : nullptr;
+  return delegate == nullptr ? nullptr : delegate->findReportingSessionForID(reporterID);
+}
+
+// Identifier 0 is "no session", although one may be stored under it.
+TWReportingClientServerInstance::Session TWReportingClientServerInstance::ownSession(
+    ReporterID reporterID) const {
+  const auto own = clientReportingSessionMap_.find(reporterID);
+  return reporterID == 0 || own == clientReportingSessionMap_.end() ? nullptr : own->second;
+}
+
+TWReportingClientServerInstance::Session TWReportingClientServerInstance::makeSession(
+    ReporterID reporterID) const {
+  return TWReportingSession::initWithID(reporterID, {processIdentifier_}, budget_);
+}
+
+void TWReportingClientServerInstance::handleConnectionError() {
+  TWReportingUtilityGetReportingServerQueue().async([self = shared_from_this()] {
+    const Delegate delegate = self->delegate_.lock();
+    if (delegate == nullptr) return;
+    const auto& clients = delegate->getAllClients();
+    if (std::find(clients.begin(), clients.end(), self) == clients.end()) return;
+    for (const auto& [reporterID, session] : self->clientReportingSessionMap_) {
+      if (session->started()) session->stop();
+    }
+    self->clientReportingSessionMap_.clear();
+    delegate->removeClient(*self);
+    infoLog(category(), "removing %i from the server client list", self->processIdentifier_);
+  });
+}
+
+std::optional<double> TWReportingClientServerInstance::clientStartDate() const {
+  const std::lock_guard lock(mutex_);
+  return clientStartDate_;
+}
+
+void TWReportingClientServerInstance::setClientStartDate(double date) {
+  const std::lock_guard lock(mutex_);
+  clientStartDate_ = date;
+}
+
+std::optional<std::string> TWReportingClientServerInstance::clientProcessName() const {
+  const std::lock_guard lock(mutex_);
+  return clientProcessName_;
+}
+
+void TWReportingClientServerInstance::setClientProcessName(std::optional<std::string> name) {
+  const std::lock_guard lock(mutex_);
+  clientProcessName_ = std::move(name);
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,229 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "service/TWReportingService.h"
+
+#include <algorithm>
+#include <chrono>
+#include <cmath>
+#include <string>
+#include <utility>
+
+#include "platform/Clock.h"
+#include "platform/LogLine.h"
+#include "platform/Metricon.h"
+#include "platform/ProcessInformation.h"
+#include "platform/SerialQueue.h"
+#include "service/TWReportingClientServerInstance.h"
+#include "service/TWReportingServiceExport.h"
+#include "session/TWReportingContext.h"
+#include "session/TWReportingKeys.h"
+#include "session/TWReportingSession.h"
+#include "session/TWReportingUtility.h"
+
+namespace tonewerk {
+namespace {
+
+constexpr ReporterID kSingleMessageReporterID = 1;
+constexpr std::chrono::milliseconds kReaperInterval{500};
+constexpr std::string_view kClientUptimeEvent = "com.orvane.tonewerk.twreportingclientuptime";
+constexpr std::string_view kUnknown = "unknown";
+
+const auto category = &TWReportingServiceDelegateCategory;
+
+double now() { return TWReportingContext::current().platform().clock.now(); }
+
+// What a double has before its point; an interval beyond a 64-bit integer saturates.
+std::int64_t wholeSeconds(const Value& seconds) { return seconds.integer(); }
+
+}  // namespace
+
+std::shared_ptr<TWReportingService> TWReportingService::make(std::function<void()> endProcess) {
+  return std::make_shared<TWReportingService>(std::move(endProcess));
+}
+
+TWReportingService::TWReportingService(std::function<void()> endProcess)
+    : endProcess_(std::move(endProcess)) {}
+
+TWReportingService::~TWReportingService() { infoLog(TWReportingClientCategory(), "destroying service"); }
+
+bool TWReportingService::listenerShouldAcceptNewConnection(MessagingConnection& connection) {
+  const std::int32_t processIdentifier = connection.processIdentifier();
+  infoLog(category(), "newConnection: %@", connection);
+  std::weak_ptr<TWReportingClientServerInstance> weakClient;
+  {
+    const std::lock_guard lock(mutex_);
+    auto client = std::make_shared<TWReportingClientServerInstance>(processIdentifier, weak_from_this());
+    weakClient = client;
+    TWReportingUtilityGetReportingServerQueue().async([this, self = weak_from_this(), weakClient] {
+      const auto service = self.lock();
+      const auto listed = weakClient.lock();
+      if (service != nullptr && listed != nullptr) registerClient(listed);
+    });
+    connection.exportObject(TWReportingServiceExport::exportedInterface(),
+                            std::make_shared<TWReportingServiceExport>(std::move(client)));
+  }
+  connection.setInterruptionHandler([weakClient] {
+    infoLog(category(), "interruptionHandler: connection exited");
+    if (const auto client = weakClient.lock()) client->handleConnectionError();
+  });
+  connection.setInvalidationHandler(
+      [this, processIdentifier, weakClient] { reportClientUptime(processIdentifier, weakClient); });
+  connection.resume();
+  return true;
+}
+
+void TWReportingService::registerClient(const Client& client) {
+  clients_.push_back(client);
+  client->setClientStartDate(now());
+  client->setClientProcessName(
+      TWReportingContext::current().platform().processes.processName(client->processIdentifier()));
+}
+
+void TWReportingService::reportClientUptime(
+    std::int32_t processIdentifier, const std::weak_ptr<TWReportingClientServerInstance>& weakClient) {
+  const auto client = weakClient.lock();
+  if (client != nullptr) client->handleConnectionError();
+  const auto startDate = client == nullptr ? std::nullopt : client->clientStartDate();
+  const auto processName = client == nullptr ? std::nullopt : client->clientProcessName();
+  const std::string shownName = processName.value_or(std::string(kUnknown));
+
+  Value seconds(-1);
+  if (startDate) {
+    const double today = now();
+    seconds = std::fabs(today - *startDate);
+    if (*startDate > today) {
+      errorLog(category(), "clientStartDate is in the past. clientpid=%d clientprocessname=%@",
+               processIdentifier, shownName);
+    }
+  } else {
+    errorLog(category(), "clientStartDate is nil. clientpid=%d clientprocessname=%@", processIdentifier,
+             shownName);
+  }
+  infoLog(category(), "invalidationHandler: connection exited process=%@ uptime_sec=%d", processName,
+          wholeSeconds(seconds));
+  if (!processName) {
+    errorLog(category(), "clientProcessName is nil. clientpid=%d", processIdentifier);
+    return;
+  }
+  TWReportingContext::current().platform().metricon.sendEvent(kClientUptimeEvent, [&] {
+    return ValueMap{{"processName", *processName}, {"seconds", seconds}};
+  });
+}
+
+TWReportingService::Session TWReportingService::findReportingSessionForID(ReporterID reporterID) {
+  const std::lock_guard lock(mutex_);
+  if (reporterID == 0 || !reportingEnabled_) return nullptr;
+  for (const Client& client : clients_) {
+    const auto& sessions = client->clientReportingSessionMap();
+    const auto found = sessions.find(reporterID);
+    if (found == sessions.end()) continue;
+    infoLog(category(), "found reporting session %lli for client %i", reporterID,
+            client->processIdentifier());
+    return found->second;
+  }
+  errorLog(category(), "failed to find reporting session %lli", reporterID);
+  return nullptr;
+}
+
+std::vector<TWReportingService::Session> TWReportingService::getAllActiveReportingSessions() {
+  std::vector<Session> active;
+  for (const Client& client : clients_) {
+    const auto& sessions = client->clientReportingSessionMap();
+    debugLog(category(), "sessions for client %i : %@", client->processIdentifier(), [&sessions] {
+      std::string list;
+      for (const auto& [reporterID, session] : sessions)
+        list += (list.empty() ? "" : ", ") + session->description();
+      return "(" + list + ")";
+    });
+    for (const auto& [reporterID, session] : sessions) {
+      if (session->started()) active.push_back(session);
+    }
+  }
+  return active;
+}
+
+std::vector<TWReportingService::Session> TWReportingService::findReportingSessionsForIDs(
+    const std::optional<std::vector<ReporterID>>& reporterIDs) {
+  if (reporterIDs && !reporterIDs->empty()) {
+    std::vector<Session> found;
+    for (const ReporterID reporterID : *reporterIDs) {
+      if (reporterID == 0) continue;
+      if (Session session = findReportingSessionForID(reporterID)) found.push_back(std::move(session));
+    }
+    return found;
+  }
+  std::vector<Session> active = getAllActiveReportingSessions();
+  logReportingSessions();
+  if (!active.empty()) return active;
+  return {singleMessageSession()};
+}
+
+TWReportingService::Session TWReportingService::singleMessageSession() {
+  const std::lock_guard lock(singleMessageMutex_);
+  if (singleMessageSession_ == nullptr) {
+    infoLog(category(), "Creating singleMessageSession");
+    singleMessageSession_ = makeSingleMessageSession();
+  }
+  if (singleMessageSessionReaper_ == nullptr) {
+    singleMessageSessionReaper_ =
+        TWReportingContext::current().platform().timers.repeat(kReaperInterval, [self = weak_from_this()] {
+          if (const auto service = self.lock()) service->_reapSingleMessageSession();
+        });
+  }
+  singleMessageSessionLastRetrieved_ = now();
+  return singleMessageSession_;
+}
+
+TWReportingService::Session TWReportingService::makeSingleMessageSession() {
+  const std::int32_t ownIdentifier =
+      TWReportingContext::current().platform().processes.ownProcessIdentifier();
+  Session session = TWReportingSession::initWithID(kSingleMessageReporterID, {ownIdentifier});
+  session->setSingleMessageSession(true);
+  session->setServiceType(kServiceStandalone);
+  const ValueMap configuration{{TWReportingApplicationName, "Unknown"}};
+  session->updateConfigurationWithContentsOfConfiguration(&configuration);
+  session->start();
+  return session;
+}
+
+void TWReportingService::_reapSingleMessageSession() {
+  Session session = takeOutSingleMessageSession();
+  if (session == nullptr) return;
+  TWReportingUtilityGetReportingServerQueue().async([session = std::move(session)] { session->stop(); });
+}
+
+TWReportingService::Session TWReportingService::takeOutSingleMessageSession() {
+  const std::lock_guard lock(singleMessageMutex_);
+  if (singleMessageSession_ == nullptr || !singleMessageSessionLastRetrieved_) return nullptr;
+  const double elapsed = now() - *singleMessageSessionLastRetrieved_;
+  if (!(kSingleMessageSessionTimeoutSeconds < elapsed)) {
+    debugLog(category(), "Not stopping singleMessageSession. elapsed=%f timeout=%f", elapsed,
+             kSingleMessageSessionTimeoutSeconds);
+    return nullptr;
+  }
+  infoLog(category(), "Stopping singleMessageSession after timeout=%f", kSingleMessageSessionTimeoutSeconds);
+  singleMessageSessionReaper_.reset();
+  return std::exchange(singleMessageSession_, nullptr);
+}
+
+void TWReportingService::stopSingleMessageSession() {
+  Session session;
+  {
+    const std::lock_guard lock(singleMessageMutex_);
+    singleMessageSessionReaper_.reset();
+    session = std::exchange(singleMessageSession_, nullptr);
+  }
+  if (session != nullptr) session->stop();
+}
+
+void TWReportingService::removeClient(const TWReportingClientServerInstance& client) {
+  std::erase_if(clients_, [&client](const Client& listed) { return listed.get() == &client; });
+}
+
+void TWReportingService::logReportingSessions() {
+  const LogCategory* log = category();
+  if (!log->isEnabled(LogLevel::kDebug)) return;  // the list is made for the log alone
+  const std::vector<Session> active = getAllActiveReportingSessions();
+  debugLog(log, "%ld active reporting session(s) %@", active.size(), active);
+}
+
+}  // namespace tonewerk

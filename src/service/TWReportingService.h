@@ -1,0 +1,77 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <atomic>
+#include <functional>
+#include <memory>
+#include <mutex>
+#include <optional>
+#include <vector>
+
+#include "platform/MessagingListener.h"
+#include "platform/TimerService.h"
+#include "service/TWReportingServiceDelegateProtocol.h"
+
+namespace tonewerk {
+
+// The daemon's one service object: accepts clients, keeps their list, finds sessions across them, and owns
+// the single-message session, which takes messages without reporter identifiers while no session is started.
+//
+// Reached by three kinds of thread: the messaging thread (acceptance and the connections' handlers), the work
+// queue (everything that concerns clients and sessions) and the reaper's.
+class TWReportingService final : public MessagingListenerDelegate,
+                                 public TWReportingServiceDelegateProtocol,
+                                 public std::enable_shared_from_this<TWReportingService> {
+ public:
+  static constexpr double kSingleMessageSessionTimeoutSeconds = 5.0;
+
+  // `endProcess` is called on the kill request, on the thread that brings it; it need not return.
+  static std::shared_ptr<TWReportingService> make(std::function<void()> endProcess);
+  explicit TWReportingService(std::function<void()> endProcess);
+  TWReportingService(const TWReportingService&) = delete;
+  TWReportingService& operator=(const TWReportingService&) = delete;
+  ~TWReportingService() override;
+
+  // Takes every connection, whoever the peer is.
+  bool listenerShouldAcceptNewConnection(MessagingConnection& connection) override;
+
+  Session findReportingSessionForID(ReporterID reporterID) override;
+  std::vector<Session> findReportingSessionsForIDs(
+      const std::optional<std::vector<ReporterID>>& reporterIDs) override;
+  std::vector<Session> getAllActiveReportingSessions() override;
+  const std::vector<Client>& getAllClients() const override { return clients_; }
+  bool isReportingEnabled() const override { return reportingEnabled_; }
+  void removeClient(const TWReportingClientServerInstance& client) override;
+  void logReportingSessions() override;
+  void endProcess() override { endProcess_(); }
+
+  // The reaper's tick, twice a second on its thread: takes out the single-message session when it was last
+  // used more than kSingleMessageSessionTimeoutSeconds ago, and has the work queue stop it.
+  void _reapSingleMessageSession();
+
+  // At the daemon's end: stops the single-message session, if there is one. On the work queue.
+  void stopSingleMessageSession();
+
+  void setReportingEnabled(bool enabled) { reportingEnabled_ = enabled; }
+
+ private:
+  void registerClient(const Client& client);
+  void reportClientUptime(std::int32_t processIdentifier,
+                          const std::weak_ptr<TWReportingClientServerInstance>& client);
+  Session singleMessageSession();
+  Session takeOutSingleMessageSession();
+  static Session makeSingleMessageSession();
+
+  const std::function<void()> endProcess_;
+  std::atomic<bool> reportingEnabled_ = true;
+  std::vector<Client> clients_;  // in order of connection; on the work queue
+
+  std::mutex mutex_;  // guards the making of a client and every search for a session
+
+  std::mutex singleMessageMutex_;  // guards what follows
+  Session singleMessageSession_;
+  std::optional<double> singleMessageSessionLastRetrieved_;  // seconds since 1970
+  std::unique_ptr<Timer> singleMessageSessionReaper_;
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,105 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "service/TWReportingServiceExport.h"
+
+#include <utility>
+
+namespace tonewerk {
+namespace {
+
+// In the order of the table below.
+enum ServiceMethod : std::size_t {
+  kCreateReportingSession,
+  kSetServiceType,
+  kGetServiceNameForReporterID,
+  kSetConfiguration,
+  kStartReportingSessionForID,
+  kSendMessage,
+  kStopReportingSessionForID,
+  kDestroyReportingSession,
+  kReporterIDValid,
+  kGetAllReporters,
+  kKillService,
+};
+
+ReporterID reporterIDOf(const Argument& argument) { return argument->integer(); }
+AudioServiceType serviceTypeOf(const Argument& argument) {
+  return static_cast<AudioServiceType>(argument->integer());
+}
+
+TWReportingServiceProtocol::ReporterIDs reporterIDsOf(const Argument& argument) {
+  if (!argument) return std::nullopt;
+  const ValueArray& list = *argument->asArray();
+  std::vector<ReporterID> identifiers;
+  identifiers.reserve(list.size());
+  for (const Value& identifier : list) identifiers.push_back(identifier.integer());
+  return identifiers;
+}
+
+}  // namespace
+
+TWReportingServiceExport::TWReportingServiceExport(std::shared_ptr<TWReportingServiceProtocol> object)
+    : object_(std::move(object)) {}
+
+const ExportedInterface& TWReportingServiceExport::exportedInterface() {
+  constexpr Parameter kReporterID{"reporterID", ParameterType::kInt64};
+  static const ExportedInterface interface {
+    {
+      {"createReportingSession", {kReporterID}},
+          {"setServiceType", {{"serviceType", ParameterType::kUInt16}, kReporterID}},
+          {"getServiceNameForReporterID", {kReporterID}},
+          {"setConfiguration", {{"configuration", ParameterType::kMap}, kReporterID}},
+          {"startReportingSessionForID", {kReporterID}},
+          {"sendMessage",
+           {{"message", ParameterType::kMap},
+            {"category", ParameterType::kUInt32},
+            {"type", ParameterType::kUInt16},
+            {"reporterIDs", ParameterType::kInt64ListOrNone}}},
+          {"stopReportingSessionForID", {kReporterID}}, {"destroyReportingSession", {kReporterID}},
+          {"reporterIDValid", {kReporterID}}, {"getAllReporters", {}}, {"killService", {}},
+    }
+  };
+  return interface;
+}
+
+void TWReportingServiceExport::handleRequest(std::size_t method, Arguments arguments, Reply reply,
+                                             RequestToken token) {
+  ServiceRequest request{std::move(reply), std::move(token)};
+  switch (method) {
+    case kCreateReportingSession:
+      return object_->createReportingSession(reporterIDOf(arguments[0]), std::move(request));
+    case kSetServiceType:
+      return object_->setServiceType(serviceTypeOf(arguments[0]), reporterIDOf(arguments[1]),
+                                     std::move(request));
+    case kGetServiceNameForReporterID:
+      return object_->getServiceNameForReporterID(reporterIDOf(arguments[0]), std::move(request));
+    case kSetConfiguration:
+      return object_->setConfiguration(*arguments[0]->asMap(), reporterIDOf(arguments[1]),
+                                       std::move(request));
+    case kStartReportingSessionForID:
+      return object_->startReportingSessionForID(reporterIDOf(arguments[0]), std::move(request));
+    case kSendMessage: {
+      ValueMap message = *arguments[0]->asMap();
+      const auto category = static_cast<AudioEventCategory>(arguments[1]->integer());
+      const auto type = static_cast<AudioEventType>(arguments[2]->integer());
+      auto identifiers = reporterIDsOf(arguments[3]);
+      arguments.clear();  // so that the message's storage is not shared, and the session need not copy it to
+                          // change it
+      return object_->sendMessage(std::move(message), category, type, std::move(identifiers),
+                                  std::move(request));
+    }
+    case kStopReportingSessionForID:
+      return object_->stopReportingSessionForID(reporterIDOf(arguments[0]), std::move(request));
+    case kDestroyReportingSession:
+      return object_->destroyReportingSession(reporterIDOf(arguments[0]), std::move(request));
+    case kReporterIDValid:
+      return object_->reporterIDValid(reporterIDOf(arguments[0]), std::move(request));
+    case kGetAllReporters:
+      return object_->getAllReporters(std::move(request));
+    case kKillService:
+      return object_->killService();
+    default:
+      return;
+  }
+}
+
+}  // namespace tonewerk
