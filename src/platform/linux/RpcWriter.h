@@ -1,0 +1,33 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <string_view>
+
+#include "platform/ExportedInterface.h"
+#include "values/Value.h"
+
+namespace tonewerk {
+
+// Appends frames of the protocol to a buffer.
+class RpcWriter {
+ public:
+  // `out` outlives the writer.
+  explicit RpcWriter(std::string& out) : out_(out) {}
+
+  void request(std::uint32_t identifier, std::string_view method, const Arguments& arguments);
+  void notification(std::string_view method, const Arguments& arguments);
+  // `error` and `result` none are nil.
+  void response(std::uint32_t identifier, const std::optional<ReplyError>& error,
+                const std::optional<Value>& result);
+
+ private:
+  std::string& out_;
+};
+
+// Whether a frame with these arguments is nested no deeper than a frame may be.
+bool fitsFrameDepth(const Arguments& arguments);
+
+}  // namespace tonewerk
