@@ -1,0 +1,145 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/ServerSocket.h"
+
+#include <cerrno>
+#include <fcntl.h>
+#include <filesystem>
+#include <fstream>
+#include <optional>
+#include <sys/file.h>
+#include <sys/stat.h>
+#include <system_error>
+#include <systemd/sd-daemon.h>
+#include <utility>
+
+#include "platform/linux/UnixAddress.h"
+
+namespace tonewerk {
+namespace {
+
+constexpr mode_t kSocketMode = 0660;
+
+std::string textOfErrno(int number) { return std::generic_category().message(number); }
+
+FileDescriptor newSocket() {
+  return FileDescriptor(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
+}
+
+std::string directoryOf(const std::string& path) {
+  const std::string directory = std::filesystem::path(path).parent_path().string();
+  return directory.empty() ? "." : directory;
+}
+
+// Held while the socket's file is looked at and replaced or removed, so that of two daemons that start
+// together one sees the other. Nothing is held when the directory cannot be opened; what follows then fails
+// by itself.
+class DirectoryLock {
+ public:
+  explicit DirectoryLock(const std::string& path)
+      : directory_(::open(directoryOf(path).c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC)) {
+    while (directory_ && ::flock(directory_.get(), LOCK_EX) != 0 && errno == EINTR) {
+    }
+  }
+
+ private:
+  FileDescriptor directory_;
+};
+
+// "name (pid)" of the process behind the other end of a connected socket.
+std::string peerOf(int descriptor) {
+  ucred peer{};
+  socklen_t size = sizeof(peer);
+  if (::getsockopt(descriptor, SOL_SOCKET, SO_PEERCRED, &peer, &size) != 0) return "another process";
+  std::ifstream comm("/proc/" + std::to_string(peer.pid) + "/comm");
+  std::string name;
+  if (!std::getline(comm, name)) name = "another process";
+  return name + " (" + std::to_string(peer.pid) + ")";
+}
+
+// Who listens at `address`; none when nobody does.
+std::optional<std::string> listenerAt(const sockaddr_un& address) {
+  const FileDescriptor probe = newSocket();
+  if (::connect(probe.get(), generic(address), sizeof(address)) == 0) return peerOf(probe.get());
+  // A listener too busy to take one more connection is still a listener.
+  return errno == EAGAIN ? std::optional<std::string>("another process") : std::nullopt;
+}
+
+// Makes way for a new socket at `path`. False when it cannot be done.
+bool clear(const std::string& path, const sockaddr_un& address, std::string& problem) {
+  struct stat there {};
+  if (::lstat(path.c_str(), &there) != 0) return true;
+  if (!S_ISSOCK(there.st_mode)) {
+    problem = path + " is there and no socket";
+    return false;
+  }
+  if (const auto listener = listenerAt(address)) {
+    problem = path + " is in use by " + *listener;
+    return false;
+  }
+  if (::unlink(path.c_str()) == 0) return true;
+  problem = "cannot replace " + path + ": " + textOfErrno(errno);
+  return false;
+}
+
+}  // namespace
+
+std::unique_ptr<ServerSocket> ServerSocket::open(const std::string& path, std::string& problem) {
+  if (auto passed = fromSystemd()) return passed;
+  return bound(path, problem);
+}
+
+std::unique_ptr<ServerSocket> ServerSocket::fromSystemd() {
+  const int count = ::sd_listen_fds(1);
+  for (int at = 0; at < count; ++at) {
+    const int descriptor = SD_LISTEN_FDS_START + at;
+    if (::sd_is_socket_unix(descriptor, SOCK_STREAM, 1, nullptr, 0) <= 0) continue;
+    ::fcntl(descriptor, F_SETFL, ::fcntl(descriptor, F_GETFL) | O_NONBLOCK);
+    auto socket = std::unique_ptr<ServerSocket>(new ServerSocket(FileDescriptor(descriptor)));
+    socket->name_ = "the socket that systemd passed";
+    return socket;
+  }
+  return nullptr;
+}
+
+std::unique_ptr<ServerSocket> ServerSocket::bound(const std::string& path, std::string& problem) {
+  const std::optional<sockaddr_un> address = unixAddressOf(path);
+  if (!address) {
+    problem = "a socket's path cannot be \"" + path + "\"";
+    return nullptr;
+  }
+  std::error_code failure;
+  std::filesystem::create_directories(directoryOf(path), failure);
+  if (failure) {
+    problem = "cannot make " + directoryOf(path) + ": " + failure.message();
+    return nullptr;
+  }
+
+  const DirectoryLock lock(path);
+  if (!clear(path, *address, problem)) return nullptr;
+  auto socket = std::unique_ptr<ServerSocket>(new ServerSocket(newSocket()));
+  const int descriptor = socket->fileDescriptor();
+  // Nobody can connect before listen(), so the mode is right from the start.
+  struct stat made {};
+  if (::bind(descriptor, generic(*address), sizeof(*address)) != 0 ||
+      ::chmod(path.c_str(), kSocketMode) != 0 || ::lstat(path.c_str(), &made) != 0 ||
+      ::listen(descriptor, SOMAXCONN) != 0) {
+    problem = "cannot listen at " + path + ": " + textOfErrno(errno);
+    return nullptr;
+  }
+  socket->name_ = path;
+  socket->path_ = path;
+  socket->device_ = made.st_dev;
+  socket->inode_ = made.st_ino;
+  return socket;
+}
+
+ServerSocket::~ServerSocket() {
+  if (path_.empty()) return;
+  const DirectoryLock lock(path_);
+  struct stat there {};
+  const bool isOurs =
+      ::lstat(path_.c_str(), &there) == 0 && there.st_dev == device_ && there.st_ino == inode_;
+  if (isOurs) ::unlink(path_.c_str());
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,44 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <memory>
+#include <string>
+#include <sys/types.h>
+
+#include "platform/linux/FileDescriptor.h"
+
+namespace tonewerk {
+
+// The Unix stream socket on which the daemon listens.
+class ServerSocket {
+ public:
+  // The listening socket that systemd passed to this process, where there is one; else a new one at `path`
+  // (mode 0660, its directory made when missing), where the file that a dead daemon left is replaced. None
+  // when that fails or another process listens there; `problem` then says why, and who.
+  static std::unique_ptr<ServerSocket> open(const std::string& path, std::string& problem);
+
+  ServerSocket(const ServerSocket&) = delete;
+  ServerSocket& operator=(const ServerSocket&) = delete;
+  // Closes the socket, and removes its file unless that is systemd's or by now somebody else's.
+  ~ServerSocket();
+
+  // Non-blocking.
+  int fileDescriptor() const { return descriptor_.get(); }
+  // For log lines.
+  const std::string& name() const { return name_; }
+
+ private:
+  explicit ServerSocket(FileDescriptor descriptor) : descriptor_(std::move(descriptor)) {}
+
+  static std::unique_ptr<ServerSocket> fromSystemd();
+  static std::unique_ptr<ServerSocket> bound(const std::string& path, std::string& problem);
+
+  FileDescriptor descriptor_;
+  std::string name_;
+  // The file that we made; no path when it is not ours.
+  std::string path_;
+  dev_t device_ = 0;
+  ino_t inode_ = 0;
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,82 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <atomic>
+#include <chrono>
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+#include <mutex>
+#include <optional>
+#include <thread>
+#include <unordered_map>
+#include <vector>
+
+#include "platform/MessagingListener.h"
+#include "platform/linux/Epoll.h"
+#include "platform/linux/IoWaker.h"
+#include "platform/linux/RpcFrameReader.h"
+#include "platform/linux/ServerSocket.h"
+#include "platform/linux/UnixConnection.h"
+
+namespace tonewerk {
+
+// Serves clients over a Unix socket, all of them on one thread of its own, the messaging thread.
+//
+// Every round gives each connection that is ready one read, so that no client can keep the others waiting.
+// Clients take only so many descriptors that kReservedDescriptors are left for the daemon's own files; who
+// comes then waits in the socket's backlog.
+class UnixSocketListener final : public MessagingListener {
+ public:
+  static constexpr std::size_t kReadBytes = std::size_t{64} * 1024;
+  static constexpr std::size_t kReservedDescriptors = 64;
+  // When the system has no descriptor for another client, the next try is after this time or a connection's
+  // end.
+  static constexpr std::chrono::milliseconds kAcceptPause{1000};
+
+  // `log` outlives the listener.
+  UnixSocketListener(std::unique_ptr<ServerSocket> socket, const LogCategory& log);
+  ~UnixSocketListener() override;
+
+  void setDelegate(MessagingListenerDelegate& delegate) override { delegate_ = &delegate; }
+  void resume() override;
+  void shutDown() override;
+
+ private:
+  // Numbers in the epoll; connections have those above.
+  static constexpr std::uint64_t kSocket = 0;
+  static constexpr std::uint64_t kWaker = 1;
+
+  void run();
+  void handle(const Epoll::Event& event);
+  void handleWakes();
+  void accept();
+  void add(FileDescriptor socket);
+  void pauseAccepting(const std::string& why);
+  void resumeAccepting();
+  std::optional<std::chrono::milliseconds> timeToNextAccept() const;
+  void removeIfEnded(std::uint64_t identifier);
+  void endEverything();
+
+  std::unique_ptr<ServerSocket> socket_;
+  const LogCategory& log_;
+  MessagingListenerDelegate* delegate_ = nullptr;
+
+  // The messaging thread's.
+  Epoll epoll_;
+  const std::shared_ptr<IoWaker> waker_ = std::make_shared<IoWaker>();
+  RpcTexts texts_;
+  std::vector<char> readBuffer_;
+  const UnixConnectionContext context_;
+  const std::size_t mostConnections_;
+  std::unordered_map<std::uint64_t, std::unique_ptr<UnixConnection>> connections_;
+  std::uint64_t nextIdentifier_ = kWaker + 1;
+  std::optional<std::chrono::steady_clock::time_point> acceptAgainAt_;  // set while accepting is paused
+  bool hasLoggedPause_ = false;
+
+  std::mutex lifeMutex_;  // of resume() and shutDown()
+  std::atomic<bool> isStopping_ = false;
+  std::thread thread_;
+};
+
+}  // namespace tonewerk
