@@ -71,8 +71,11 @@ class ReportingClient {
                                     const std::vector<std::int64_t>& reporterIDs);
 
  private:
-  class Connection;
-  std::unique_ptr<Connection> connection_;
+  struct Connection;
+
+  std::error_code send(std::string_view frame);
+
+  std::shared_ptr<Connection> connection_;  // shared with processAnswers(), whose handlers may disconnect
   std::chrono::milliseconds sendTimeout_{10'000};
 };
 

@@ -1,0 +1,157 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "client/ReportingClient.h"
+
+#include <algorithm>
+#include <cstdlib>
+#include <unistd.h>
+#include <unordered_map>
+#include <utility>
+
+#include "client/RpcClientSocket.h"
+#include "platform/linux/Directories.h"
+#include "platform/linux/RpcLimits.h"
+#include "platform/linux/RpcWriter.h"
+
+namespace tonewerk {
+namespace {
+
+using std::chrono::milliseconds;
+
+constexpr const char* kSocketVariable = "TONEWERK_REPORTING_SOCKET";
+constexpr const char* kSocketName = "/reporting.sock";
+
+ReplyError errorOf(const Value& value) {
+  const ValueMap* map = value.asMap();
+  if (map == nullptr) return ReplyError{std::string(), 0, value.text()};
+  return ReplyError{map->text("domain"), map->integer("code"), map->text("message")};
+}
+
+Answer answerOf(RpcFrame& frame) {
+  Answer answer;
+  if (frame.error) {
+    answer.error = errorOf(*frame.error);
+  } else {
+    answer.result = std::move(frame.result);
+  }
+  return answer;
+}
+
+std::error_code problemWithFrame(const std::string& frame, const Arguments& arguments) {
+  if (frame.size() > kMostFrameBytes) return std::make_error_code(std::errc::message_size);
+  if (!fitsFrameDepth(arguments)) return std::make_error_code(std::errc::invalid_argument);
+  return {};
+}
+
+}  // namespace
+
+struct ReportingClient::Connection {
+  RpcClientSocket socket;
+  std::uint32_t nextIdentifier = 1;
+  std::unordered_map<std::uint32_t, AnswerHandler> waiting;
+};
+
+ReportingClient::ReportingClient() = default;
+
+ReportingClient::~ReportingClient() = default;
+
+std::vector<std::string> ReportingClient::socketPaths() {
+  if (const char* chosen = std::getenv(kSocketVariable); chosen != nullptr && *chosen != '\0')
+    return {chosen};
+  const std::string own = Directories::fromEnvironment().runtime + kSocketName;
+  const std::string system = Directories::system().runtime + kSocketName;
+  return own == system ? std::vector{system} : std::vector{own, system};
+}
+
+std::error_code ReportingClient::connect(const std::vector<std::string>& paths) {
+  disconnect();
+  std::error_code error = std::make_error_code(std::errc::no_such_file_or_directory);
+  for (const std::string& path : paths) {
+    auto connection = std::make_shared<Connection>();
+    error = connection->socket.connect(path, sendTimeout_);
+    if (error) continue;
+    connection_ = std::move(connection);
+    return {};
+  }
+  return error;
+}
+
+void ReportingClient::disconnect() { connection_ = nullptr; }
+
+bool ReportingClient::isConnected() const { return connection_ != nullptr; }
+
+int ReportingClient::fileDescriptor() const {
+  return connection_ ? connection_->socket.fileDescriptor() : -1;
+}
+
+void ReportingClient::setSendTimeout(milliseconds timeout) { sendTimeout_ = timeout; }
+
+std::error_code ReportingClient::request(std::string_view method, const Arguments& arguments,
+                                         AnswerHandler handler) {
+  if (!connection_) return std::make_error_code(std::errc::not_connected);
+  const std::uint32_t identifier = connection_->nextIdentifier++;
+  std::string frame;
+  RpcWriter(frame).request(identifier, method, arguments);
+  if (const std::error_code problem = problemWithFrame(frame, arguments)) return problem;
+  connection_->waiting.insert_or_assign(identifier, std::move(handler));
+  return send(frame);
+}
+
+std::error_code ReportingClient::notify(std::string_view method, const Arguments& arguments) {
+  if (!connection_) return std::make_error_code(std::errc::not_connected);
+  std::string frame;
+  RpcWriter(frame).notification(method, arguments);
+  if (const std::error_code problem = problemWithFrame(frame, arguments)) return problem;
+  return send(frame);
+}
+
+std::error_code ReportingClient::send(std::string_view frame) {
+  const std::error_code error = connection_->socket.send(frame, sendTimeout_);
+  if (error) disconnect();  // half a frame may be out, and nothing can follow it
+  return error;
+}
+
+std::error_code ReportingClient::processAnswers(milliseconds timeout) {
+  const std::shared_ptr<Connection> connection = connection_;
+  if (!connection) return std::make_error_code(std::errc::not_connected);
+  std::deque<RpcFrame>& arrived = connection->socket.arrived();
+  const std::error_code error = connection->socket.receive(arrived.empty() ? timeout : milliseconds::zero());
+  const bool hasAnswers = !arrived.empty();
+  while (connection_ == connection && !arrived.empty()) {
+    RpcFrame frame = std::move(arrived.front());
+    arrived.pop_front();
+    auto waiting = connection->waiting.extract(frame.identifier);
+    if (!waiting.empty() && waiting.mapped()) waiting.mapped()(answerOf(frame));
+  }
+  if (hasAnswers || !error) return {};
+  if (error == std::errc::timed_out) return timeout > milliseconds::zero() ? error : std::error_code();
+  if (connection_ == connection) disconnect();
+  return error;
+}
+
+std::optional<Answer> ReportingClient::call(std::string_view method, const Arguments& arguments,
+                                            milliseconds timeout, std::error_code& error) {
+  const auto until = std::chrono::steady_clock::now() + timeout;
+  // Shared, because after a time-out the answer may still come.
+  const auto answer = std::make_shared<std::optional<Answer>>();
+  error = request(method, arguments, [answer](const Answer& given) { *answer = given; });
+  while (!error && !answer->has_value()) {
+    const auto left = std::chrono::ceil<milliseconds>(until - std::chrono::steady_clock::now());
+    error = left > milliseconds::zero() ? processAnswers(left) : std::make_error_code(std::errc::timed_out);
+  }
+  return *answer;
+}
+
+Arguments ReportingClient::messageArguments(ValueMap message, std::uint32_t category, std::uint16_t type,
+                                            const std::vector<std::int64_t>& reporterIDs) {
+  Argument recipients;
+  if (!reporterIDs.empty())
+    recipients = ValueArray(std::vector<Value>(reporterIDs.begin(), reporterIDs.end()));
+  Arguments arguments;
+  arguments.emplace_back(std::move(message));
+  arguments.emplace_back(Value(category));
+  arguments.emplace_back(Value(type));
+  arguments.push_back(std::move(recipients));
+  return arguments;
+}
+
+}  // namespace tonewerk
