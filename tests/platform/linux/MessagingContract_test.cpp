@@ -1,0 +1,258 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What every messaging listener does, run on the one over sockets and on its double in memory.
+#include <gmock/gmock.h>
+#include <map>
+#include <string>
+#include <unistd.h>
+#include <vector>
+
+#include "client/ReportingClient.h"
+#include "platform/linux/MessagingRig.h"
+#include "platform/linux/UnixSocketListener.h"
+#include "support/MemoryLog.h"
+#include "support/MemoryMessaging.h"
+#include "support/TemporaryDirectory.h"
+
+namespace tonewerk {
+namespace {
+
+using testing::ElementsAre;
+using testing::IsEmpty;
+using testing::SizeIs;
+
+class MemorySide {
+ public:
+  explicit MemorySide(MessagingListenerDelegate& delegate) {
+    messaging_.setDelegate(delegate);
+    messaging_.resume();
+  }
+  static std::int32_t clientProcess() { return 77; }
+  void connect() { client_ = messaging_.connect(clientProcess()); }
+  void request(std::string_view method, Arguments arguments) {
+    client_->request(method, std::move(arguments));
+  }
+  void notify(std::string_view method, Arguments arguments) { client_->notify(method, std::move(arguments)); }
+  std::vector<Answer> answers(std::size_t count) {
+    EXPECT_TRUE(client_->waitForResponses(count));
+    std::vector<Answer> answers;
+    for (const MemoryResponse& response : client_->responses())
+      answers.push_back({response.error, response.result});
+    return answers;
+  }
+  void disconnect() { client_->disconnect(); }
+  void shutDown() { messaging_.shutDown(); }
+  // Whether the client has been let in and not been sent away.
+  bool isServed() { return client_ != nullptr && !client_->hasEnded(); }
+
+ private:
+  MemoryMessaging messaging_;
+  std::unique_ptr<MemoryClient> client_;
+};
+
+class SocketSide {
+ public:
+  explicit SocketSide(MessagingListenerDelegate& delegate) {
+    std::string problem;
+    auto socket = ServerSocket::open(path_, problem);
+    EXPECT_NE(socket, nullptr) << problem;
+    listener_ = std::make_unique<UnixSocketListener>(std::move(socket), category_);
+    listener_->setDelegate(delegate);
+    listener_->resume();
+  }
+  static std::int32_t clientProcess() { return ::getpid(); }
+  void connect() { EXPECT_FALSE(client_.connect({path_})); }
+  void request(std::string_view method, const Arguments& arguments) {
+    EXPECT_FALSE(
+        client_.request(method, arguments, [this](const Answer& answer) { answers_.push_back(answer); }));
+  }
+  void notify(std::string_view method, const Arguments& arguments) {
+    EXPECT_FALSE(client_.notify(method, arguments));
+  }
+  std::vector<Answer> answers(std::size_t count) {
+    while (answers_.size() < count && !client_.processAnswers(kPatience)) {
+    }
+    return answers_;
+  }
+  void disconnect() { client_.disconnect(); }
+  void shutDown() { listener_->shutDown(); }
+  bool isServed() {
+    std::error_code error;
+    return client_.call("takeInt64", {Value(1)}, kPatience, error).has_value();
+  }
+
+ private:
+  TemporaryDirectory directory_;
+  const std::string path_ = directory_.path("reporting.sock");
+  MemoryLog log_;
+  LogCategory category_{log_, "com.example", "twrs"};
+  std::unique_ptr<UnixSocketListener> listener_;
+  ReportingClient client_;
+  std::vector<Answer> answers_;
+};
+
+template <typename Side>
+class MessagingContractTest : public testing::Test {
+ protected:
+  MessagingRecord record;
+  RigDelegate delegate{record};
+  Side side{delegate};
+};
+
+using Sides = testing::Types<MemorySide, SocketSide>;
+TYPED_TEST_SUITE(MessagingContractTest, Sides);
+
+TYPED_TEST(MessagingContractTest, TellsTheDelegateWhoConnects) {
+  this->side.connect();
+  ASSERT_TRUE(this->record.waitForEvents(1));
+  EXPECT_EQ(this->delegate.lastProcessIdentifier, TypeParam::clientProcess());
+}
+
+TYPED_TEST(MessagingContractTest, DoesNotServeWhomTheDelegateTurnsAway) {
+  this->delegate.turnsAway = true;
+  this->side.connect();
+  ASSERT_TRUE(this->record.waitForEvents(1));
+  EXPECT_FALSE(this->side.isServed());
+  EXPECT_THAT(this->record.events(), ElementsAre("turned away"));
+}
+
+TYPED_TEST(MessagingContractTest, HandsRequestsOverInOrder) {
+  this->side.connect();
+  this->side.request("takeInt64", {Value(1)});
+  this->side.notify("takeInt64", {Value(2)});
+  this->side.request("takeInt64", {Value(3)});
+  ASSERT_TRUE(this->record.waitForRequests(3));
+  std::vector<std::int64_t> numbers;
+  for (const ReceivedRequest& request : this->record.requests()) {
+    numbers.push_back(request.arguments.at(0)->integer());
+  }
+  EXPECT_THAT(numbers, ElementsAre(1, 2, 3));
+}
+
+TYPED_TEST(MessagingContractTest, CarriesEveryKindOfValueThereAndBack) {
+  const ValueMap map{{"boolean", true},
+                     {"negative", -5},
+                     {"large", std::uint64_t{18446744073709551615U}},
+                     {"double", 0.25},
+                     {"whole double", 2.0},
+                     {"text",
+                      "Gr\xC3\xBC\xC3\x9F"
+                      "e"},
+                     {"date", Date{1763634000.5}},
+                     {"array", ValueArray{1, "two", ValueArray{}}},
+                     {"map", ValueMap{{"inner", 3.5}}},
+                     {"", "empty key"}};
+  this->side.connect();
+  this->side.request("echo", {Value(map)});
+  const std::vector<Answer> answers = this->side.answers(1);
+  ASSERT_THAT(answers, SizeIs(1));
+  ASSERT_TRUE(answers[0].result && answers[0].result->asMap());
+  EXPECT_EQ(*answers[0].result->asMap(), map);
+  EXPECT_EQ(answers[0].result->asMap()->find("date")->kind(), Value::Kind::kDate);
+  EXPECT_EQ(answers[0].result->asMap()->find("whole double")->kind(), Value::Kind::kDouble);
+  EXPECT_EQ(answers[0].result->asMap()->find("boolean")->kind(), Value::Kind::kBoolean);
+}
+
+TYPED_TEST(MessagingContractTest, NeverAnswersANotification) {
+  this->side.connect();
+  this->side.notify("echo", {Value(ValueMap{})});
+  this->side.notify("noSuchMethod", {});
+  this->side.notify("takeInt64", {Value("text")});
+  this->side.request("takeInt64", {Value(1)});
+  EXPECT_THAT(this->side.answers(1), SizeIs(1));
+  EXPECT_THAT(this->record.requests(), SizeIs(2));
+}
+
+TYPED_TEST(MessagingContractTest, AnswersWithTheObjectsOwnError) {
+  this->side.connect();
+  this->side.request("fail", {});
+  const std::vector<Answer> answers = this->side.answers(1);
+  ASSERT_THAT(answers, SizeIs(1));
+  EXPECT_EQ(answers[0].error, (ReplyError{"com.example", 7, ""}));
+  EXPECT_FALSE(answers[0].result);
+}
+
+TYPED_TEST(MessagingContractTest, RefusesAMethodNobodyKnowsAndLivesOn) {
+  this->side.connect();
+  this->side.request("noSuchMethod", {Value(1)});
+  this->side.request("takeInt64", {Value(1)});
+  const std::vector<Answer> answers = this->side.answers(2);
+  ASSERT_THAT(answers, SizeIs(2));
+  EXPECT_EQ(answers[0].error, messagingError(kUnknownMethod, "unknown method noSuchMethod"));
+  EXPECT_FALSE(answers[1].error);
+}
+
+TYPED_TEST(MessagingContractTest, RefusesArgumentsThatDoNotSuitAndLivesOn) {
+  this->side.connect();
+  this->side.request("takeTwo", {Value(ValueMap{}), Value(1.0)});
+  this->side.request("takeTwo", {Value(ValueMap{})});
+  this->side.request("takeTwo", {Value(ValueMap{}), Value(1)});
+  const std::vector<Answer> answers = this->side.answers(3);
+  ASSERT_THAT(answers, SizeIs(3));
+  EXPECT_EQ(answers[0].error, messagingError(kInvalidArguments,
+                                             "takeTwo: argument 2 (number) must be a signed 64-bit integer"));
+  EXPECT_EQ(answers[1].error, messagingError(kInvalidArguments, "takeTwo takes 2 arguments, not 1"));
+  EXPECT_FALSE(answers[2].error);
+  EXPECT_THAT(this->record.requests(), SizeIs(1));
+}
+
+TYPED_TEST(MessagingContractTest, AnswersLaterAndOutOfOrder) {
+  this->side.connect();
+  this->side.request("hold", {Value(1)});
+  this->side.request("hold", {Value(2)});
+  ASSERT_TRUE(this->record.waitForHeld(2));
+  auto held = this->record.takeHeld();
+  held[1].first(std::nullopt, Value("second"));
+  held[0].first(std::nullopt, Value("first"));
+  const std::vector<Answer> answers = this->side.answers(2);
+  ASSERT_THAT(answers, SizeIs(2));
+  EXPECT_EQ(answers[0].result, Value("second"));
+  EXPECT_EQ(answers[1].result, Value("first"));
+}
+
+TYPED_TEST(MessagingContractTest, RunsItsHandlersOnceInOrderAndThenLetsTheObjectGo) {
+  this->side.connect();
+  ASSERT_TRUE(this->record.waitForEvents(1));
+  this->side.disconnect();
+  ASSERT_TRUE(this->record.waitForEvents(4));
+  this->side.shutDown();
+  EXPECT_THAT(this->record.events(), ElementsAre("accepted", "interrupted", "invalidated", "object gone"));
+}
+
+TYPED_TEST(MessagingContractTest, EndsEveryConnectionBeforeShuttingDownReturns) {
+  this->side.connect();
+  ASSERT_TRUE(this->record.waitForEvents(1));
+  this->side.shutDown();
+  EXPECT_THAT(this->record.events(), ElementsAre("accepted", "interrupted", "invalidated", "object gone"));
+  this->side.shutDown();
+  EXPECT_THAT(this->record.events(), SizeIs(4));
+}
+
+TYPED_TEST(MessagingContractTest, LetsRepliesToAClientThatIsGoneGoNowhere) {
+  this->side.connect();
+  this->side.request("hold", {Value(1)});
+  ASSERT_TRUE(this->record.waitForHeld(1));
+  this->side.disconnect();
+  ASSERT_TRUE(this->record.waitForEvents(4));
+  auto held = this->record.takeHeld();
+  held[0].first(std::nullopt, Value("late"));
+  this->side.connect();
+  this->side.request("takeInt64", {Value(1)});
+  const std::vector<Answer> answers = this->side.answers(1);
+  ASSERT_THAT(answers, SizeIs(1));
+  EXPECT_FALSE(answers[0].result);
+}
+
+TYPED_TEST(MessagingContractTest, LetsRepliesAfterShuttingDownGoNowhere) {
+  this->side.connect();
+  this->side.request("hold", {Value(1)});
+  ASSERT_TRUE(this->record.waitForHeld(1));
+  this->side.shutDown();
+  auto held = this->record.takeHeld();
+  held[0].first(std::nullopt, Value("late"));
+  held.clear();
+  EXPECT_THAT(this->record.events(), SizeIs(4));
+}
+
+}  // namespace
+}  // namespace tonewerk

@@ -1,0 +1,160 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <atomic>
+#include <chrono>
+#include <condition_variable>
+#include <cstddef>
+#include <cstdint>
+#include <functional>
+#include <memory>
+#include <mutex>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "platform/MessagingListener.h"
+
+namespace tonewerk {
+
+// Long enough for the slowest machine; no test waits so long unless it fails.
+inline constexpr std::chrono::seconds kPatience{30};
+
+// A request as an exported object got it.
+struct ReceivedRequest {
+  std::string method;
+  Arguments arguments;
+};
+
+// One method for every parameter type, and some that answer in their own way.
+inline const ExportedInterface& rigInterface() {
+  static const ExportedInterface interface {
+    {
+      {"takeInt64", {{"number", ParameterType::kInt64}}},
+          {"takeUInt32", {{"number", ParameterType::kUInt32}}},
+          {"takeUInt16", {{"number", ParameterType::kUInt16}}}, {"takeMap", {{"map", ParameterType::kMap}}},
+          {"takeList", {{"list", ParameterType::kInt64ListOrNone}}},
+          {"takeTwo", {{"map", ParameterType::kMap}, {"number", ParameterType::kInt64}}},
+          {"echo", {{"map", ParameterType::kMap}}},            // answers with the map
+          {"answerTwice", {}},                                 // 1, then 2
+          {"fail", {}},                                        // an error
+          {"hold", {{"number", ParameterType::kInt64}}},       // keeps token and reply
+          {"holdReply", {{"number", ParameterType::kInt64}}},  // keeps the reply alone
+          {"holdMap", {{"map", ParameterType::kMap}}},         // keeps token and reply
+    }
+  };
+  return interface;
+}
+
+// What connections do and what reaches them, for a test on another thread to wait for and look at.
+class MessagingRecord {
+ public:
+  void add(std::string event) {
+    const std::lock_guard lock(mutex_);
+    events_.push_back(std::move(event));
+    changed_.notify_all();
+  }
+  void add(ReceivedRequest request) {
+    const std::lock_guard lock(mutex_);
+    requests_.push_back(std::move(request));
+    changed_.notify_all();
+  }
+  void hold(Reply reply, RequestToken token) {
+    const std::lock_guard lock(mutex_);
+    held_.emplace_back(std::move(reply), std::move(token));
+    changed_.notify_all();
+  }
+
+  std::vector<std::string> events() const {
+    const std::lock_guard lock(mutex_);
+    return events_;
+  }
+  std::vector<ReceivedRequest> requests() const {
+    const std::lock_guard lock(mutex_);
+    return requests_;
+  }
+  std::size_t heldCount() const {
+    const std::lock_guard lock(mutex_);
+    return held_.size();
+  }
+  // Takes out what methods that hold have kept.
+  std::vector<std::pair<Reply, RequestToken>> takeHeld() {
+    const std::lock_guard lock(mutex_);
+    return std::exchange(held_, {});
+  }
+
+  bool waitForEvents(std::size_t count) const {
+    return waitUntil([this, count] { return events_.size() >= count; });
+  }
+  bool waitForRequests(std::size_t count) const {
+    return waitUntil([this, count] { return requests_.size() >= count; });
+  }
+  bool waitForHeld(std::size_t count) const {
+    return waitUntil([this, count] { return held_.size() >= count; });
+  }
+
+ private:
+  bool waitUntil(const std::function<bool()>& condition) const {
+    std::unique_lock lock(mutex_);
+    return changed_.wait_for(lock, kPatience, condition);
+  }
+
+  mutable std::mutex mutex_;
+  mutable std::condition_variable changed_;
+  // Under mutex_.
+  std::vector<std::string> events_;
+  std::vector<ReceivedRequest> requests_;
+  std::vector<std::pair<Reply, RequestToken>> held_;
+};
+
+class RigObject final : public ExportedObject {
+ public:
+  explicit RigObject(MessagingRecord& record) : record_(record) {}
+  RigObject(const RigObject&) = delete;
+  RigObject& operator=(const RigObject&) = delete;
+  ~RigObject() override { record_.add("object gone"); }
+
+  void handleRequest(std::size_t method, Arguments arguments, Reply reply, RequestToken token) override {
+    const std::string name(rigInterface().methods[method].name);
+    const Argument first = arguments.empty() ? Argument() : arguments.front();
+    record_.add(ReceivedRequest{name, std::move(arguments)});
+    if (name == "echo") return reply(std::nullopt, first);
+    if (name == "fail") return reply(ReplyError{"com.example", 7, ""});
+    if (name == "hold" || name == "holdMap") return record_.hold(std::move(reply), std::move(token));
+    if (name == "holdReply") return record_.hold(std::move(reply), RequestToken());
+    if (name != "answerTwice") return reply(std::nullopt);
+    reply(std::nullopt, Value(1));
+    reply(std::nullopt, Value(2));
+  }
+
+ private:
+  MessagingRecord& record_;
+};
+
+// Accepts everybody, until told otherwise, and exports a RigObject to each.
+class RigDelegate final : public MessagingListenerDelegate {
+ public:
+  explicit RigDelegate(MessagingRecord& record) : record_(record) {}
+
+  bool listenerShouldAcceptNewConnection(MessagingConnection& connection) override {
+    if (turnsAway) {
+      record_.add("turned away");
+      return false;
+    }
+    lastProcessIdentifier = connection.processIdentifier();
+    connection.exportObject(rigInterface(), std::make_shared<RigObject>(record_));
+    connection.setInterruptionHandler([this] { record_.add("interrupted"); });
+    connection.setInvalidationHandler([this] { record_.add("invalidated"); });
+    connection.resume();
+    record_.add("accepted");
+    return true;
+  }
+
+  std::atomic<bool> turnsAway = false;
+  std::atomic<std::int32_t> lastProcessIdentifier = 0;
+
+ private:
+  MessagingRecord& record_;
+};
+
+}  // namespace tonewerk
