@@ -26,7 +26,6 @@ namespace tonewerk {
 // another number of conversions than arguments does not compile.
 
 // How an argument becomes text. Overload for more types, or give them a description().
-inline void appendLogText(std::string& out, std::string_view text) { out += text; }
 inline void appendLogText(std::string& out, const Value& value) { out += value.text(); }
 inline void appendLogText(std::string& out, const Value* value) { out += textOf(value); }
 inline void appendLogText(std::string& out, const ValueMap& map) { out += map.text(); }
@@ -39,7 +38,9 @@ concept Describable = requires(const T& object) {
 
 template <typename T>
 void appendLogArgument(std::string& out, const T& argument, char conversion) {
-  if constexpr (std::floating_point<T>) {
+  if constexpr (std::convertible_to<const T&, std::string_view>) {
+    out += std::string_view(argument);
+  } else if constexpr (std::floating_point<T>) {
     appendLogNumber(out, argument, conversion);
   } else if constexpr (std::integral<T>) {
     out += Value(argument).text();

@@ -1,0 +1,96 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "session/TWReportingSessionMessage.h"
+
+#include <cmath>
+#include <gtest/gtest.h>
+#include <mutex>
+#include <thread>
+
+#include "support/ReportingTest.h"
+#include "workers/sinks/TWReportingSessionMetriconWorker.h"
+
+namespace tonewerk {
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+
+class TWReportingSessionMessageTest : public ReportingTest {};
+
+TEST_F(TWReportingSessionMessageTest, StartsNeitherRedundantNorStartedNorAddressed) {
+  const TWReportingSessionMessage record({{"a", 1}}, 4, 1);
+  EXPECT_EQ(record.category, 4U);
+  EXPECT_EQ(record.type, 1);
+  EXPECT_FALSE(record.isRedundant);
+  EXPECT_FALSE(record.isSessionStarted);
+  EXPECT_THAT(record.destinationWorkers, IsEmpty());
+}
+
+TEST_F(TWReportingSessionMessageTest, ItsPayloadIsItsOwn) {
+  const ValueMap payload{{"a", 1}};
+  TWReportingSessionMessage record(payload, 4, 1);
+  record.message.set("a", 2);
+  EXPECT_EQ(payload.integer("a"), 1);
+}
+
+TEST_F(TWReportingSessionMessageTest, ACopyIsIndependentAndHasNoDestinations) {
+  TWReportingSessionMessage record({{"nested", ValueMap{{"x", 1}}}}, 0x20000004, 7);
+  record.isRedundant = true;
+  record.isSessionStarted = true;
+  record.destinationWorkers = {&TWReportingSessionMetriconWorker::kWorkerClass};
+
+  const auto copy = record.copyWithZone();
+  record.message.set("nested", 5);
+
+  EXPECT_EQ(copy->message, (ValueMap{{"nested", ValueMap{{"x", 1}}}}));
+  EXPECT_EQ(copy->category, 0x20000004U);
+  EXPECT_EQ(copy->type, 7);
+  EXPECT_TRUE(copy->isRedundant);
+  EXPECT_TRUE(copy->isSessionStarted);
+  EXPECT_THAT(copy->destinationWorkers, IsEmpty());
+  EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kDebug), ElementsAre("copyWithZone"));
+}
+
+TEST_F(TWReportingSessionMessageTest, DescribesItselfByCategoryTypeAndPayload) {
+  EXPECT_EQ(TWReportingSessionMessage({{"a", 1}}, 4, 1).description(),
+            R"(category=Playback type=Start {"a":1})");
+}
+
+TEST_F(TWReportingSessionMessageTest, ItsTimeIsItsTimestampOrZero) {
+  EXPECT_EQ(messageAt(12.5, {})->epochTime(), 12.5);
+  EXPECT_EQ(message({{"twreporting_timestamp", "12.5"}})->epochTime(), 12.5);
+  EXPECT_EQ(message({})->epochTime(), 0.0);
+}
+
+TEST_F(TWReportingSessionMessageTest, SortsByTimeWithTheTimelessFirstAndKeepsTheOrderOfEqualTimes) {
+  TWReportingSessionMessages messages{messageAt(5, {{"n", "a"}}), message({{"n", "b"}}),
+                                      messageAt(1, {{"n", "c"}}), messageAt(5, {{"n", "d"}}),
+                                      message({{"n", "e"}}),      messageAt(1, {{"n", "f"}})};
+  TWReportingSessionMessage::sortMessages(messages);
+  EXPECT_THAT(textsUnder("n", messages), ElementsAre("b", "e", "c", "f", "a", "d"));
+}
+
+TEST_F(TWReportingSessionMessageTest, SortsATimeThatIsNoNumberAsNone) {
+  TWReportingSessionMessages messages{messageAt(2, {{"n", "a"}}), messageAt(std::nan(""), {{"n", "b"}}),
+                                      messageAt(1, {{"n", "c"}}), messageAt(-1, {{"n", "d"}})};
+  TWReportingSessionMessage::sortMessages(messages);
+  EXPECT_THAT(textsUnder("n", messages), ElementsAre("d", "b", "c", "a"));
+}
+
+TEST_F(TWReportingSessionMessageTest, ItsLockExcludesOthers) {
+  const TWReportingSessionMessage record({}, 4, 1);
+  int count = 0;
+  const auto work = [&] {
+    for (int i = 0; i < 1000; ++i) {
+      const std::lock_guard lock(record);
+      ++count;
+    }
+  };
+  std::thread other(work);
+  work();
+  other.join();
+  EXPECT_EQ(count, 2000);
+}
+
+}  // namespace
+}  // namespace tonewerk

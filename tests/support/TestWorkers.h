@@ -1,0 +1,51 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <functional>
+#include <map>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "session/TWReportingSessionWorkerClass.h"
+
+namespace tonewerk {
+
+// What test workers do, in order, as "Volume started", "Capsa failed to start", "Rtc got a=1", "Rtc got a=1
+// redundant", "Rtc stopped"; and how a test makes them do otherwise. One may live at a time; without one
+// workers do nothing.
+class TestWorkerJournal {
+ public:
+  TestWorkerJournal();
+  TestWorkerJournal(const TestWorkerJournal&) = delete;
+  TestWorkerJournal& operator=(const TestWorkerJournal&) = delete;
+  ~TestWorkerJournal();
+
+  // What happened since the last call.
+  std::vector<std::string> take();
+  // Runs `action` once, when `event` happens.
+  void onEvent(const std::string& event, std::function<void()> action);
+  void failStart(std::string_view workerName) { failingStart_ = workerName; }
+  void failToMake(std::string_view workerName) { failingToMake_ = workerName; }
+
+  // For the workers. Null without a journal.
+  static TestWorkerJournal* current();
+  void add(const std::string& event);
+  bool startFails(std::string_view workerName) const { return failingStart_ == workerName; }
+  bool makingFails(std::string_view workerName) const { return failingToMake_ == workerName; }
+
+ private:
+  std::vector<std::string> events_;
+  std::map<std::string, std::function<void()>> actions_;
+  std::string failingStart_;
+  std::string failingToMake_;
+};
+
+// Sixteen classes with the roles and answers of the daemon's workers, in their order: Trace, Volume, Gather,
+// Summary, Input, Metricon, Energybook, MemoryLog, Diagwire, DriverSnapshot, SystemMonitor, Capsa, DP,
+// JsonFile, Rtc, IssueDraft.
+std::vector<const TWReportingSessionWorkerClass*> testWorkerClasses();
+std::vector<const TWReportingSessionWorkerClass*> testWorkerClassesWithoutStartOnInit();
+const TWReportingSessionWorkerClass* testWorkerClass(std::string_view name);
+
+}  // namespace tonewerk
