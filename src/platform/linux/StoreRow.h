@@ -1,0 +1,31 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <array>
+#include <cstddef>
+#include <variant>
+
+#include "values/Value.h"
+
+namespace tonewerk {
+
+// One payload recorded under one or two analytics names. A message usually goes out under two, and costs one
+// row.
+struct AnalyticsRow {
+  static constexpr std::size_t kMaxNames = 2;
+
+  double recordedAt = 0.0;                      // seconds since 1970
+  std::array<SharedString, kMaxNames> names{};  // the second is empty when there is one
+  ValueMap payload;
+
+  std::size_t bytes() const { return sizeof(AnalyticsRow) + payload.bytes(); }
+};
+
+// What the store writes as one row of one of its tables.
+using StoreRow = std::variant<AnalyticsRow>;
+
+inline std::size_t bytesOf(const StoreRow& row) {
+  return std::visit([](const auto& held) { return held.bytes(); }, row);
+}
+
+}  // namespace tonewerk
