@@ -1,0 +1,330 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "workers/producers/TWReportingSessionVolumeMessagesWorker.h"
+
+#include <cmath>
+#include <gtest/gtest.h>
+#include <rapidcheck/gtest.h>
+#include <string>
+#include <vector>
+
+#include "support/ReportingTest.h"
+#include "workers/sinks/TWReportingSessionMetriconWorker.h"
+
+namespace tonewerk {
+namespace {
+
+using ::testing::Contains;
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+using ::testing::SizeIs;
+using ::testing::StartsWith;
+
+// A message of a stream: seconds, then what it says.
+struct Step {
+  double at;
+  ValueMap says;
+};
+
+const Value kOn(true);
+const Value kOff(false);
+
+class VolumeMessagesTest : public ReportingTest {
+ protected:
+  VolumeMessagesTest()
+      : ReportingTest({&TWReportingSessionVolumeMessagesWorker::kWorkerClass,
+                       &TWReportingSessionMetriconWorker::kWorkerClass}) {
+    session = makeSession();
+  }
+
+  static TWReportingSessionMessages stream(const std::vector<Step>& steps) {
+    TWReportingSessionMessages messages;
+    for (const Step& step : steps) messages.push_back(messageAt(step.at, step.says));
+    return messages;
+  }
+
+  TWReportingSessionMessages summariesOf(const TWReportingSessionMessages& messages) {
+    const TWReportingSessionVolumeMessagesWorker worker(session);
+    const SharedString process("com.orvane.player");
+    return worker.createVolumeMessages(messages, &process, 0.5);
+  }
+
+  // Each summary as "seconds@volume", in order.
+  std::vector<std::string> playedIn(const std::vector<Step>& steps) {
+    std::vector<std::string> played;
+    for (const auto& summary : summariesOf(stream(steps))) {
+      played.push_back(summary->message.text("play_seconds") + "@" +
+                       summary->message.text("QMSessionVolume"));
+    }
+    return played;
+  }
+
+  std::shared_ptr<TWReportingSession> session;
+};
+
+// Streams and the summaries expected of them, to be checked by eye.
+
+struct StreamCase {
+  std::string name;
+  std::vector<Step> stream;
+  std::vector<std::string> expected;  // "seconds@volume"
+};
+
+class VolumeStreamTest : public VolumeMessagesTest, public ::testing::WithParamInterface<StreamCase> {};
+
+TEST_P(VolumeStreamTest, IsSummarised) { EXPECT_EQ(playedIn(GetParam().stream), GetParam().expected); }
+
+const char kRunning[] = "session_output_running";
+const char kVolume[] = "QMSessionVolume";
+
+INSTANTIATE_TEST_SUITE_P(
+    Streams, VolumeStreamTest,
+    ::testing::Values(
+        StreamCase{"Nothing", {}, {}},
+        StreamCase{"PlayedAtOneVolume",
+                   {{10, {{kRunning, kOn}, {kVolume, 0.5}}}, {52, {{kRunning, kOff}}}},
+                   {"42@0.5"}},
+        StreamCase{"PlayedForExactlyTheMinimum",
+                   {{10, {{kRunning, kOn}, {kVolume, 0.5}}}, {10.5, {{kRunning, kOff}}}},
+                   {}},
+        StreamCase{"PlayedForALittleMoreThanTheMinimum",
+                   {{10, {{kRunning, kOn}, {kVolume, 0.5}}}, {10.625, {{kRunning, kOff}}}},
+                   {"0.625@0.5"}},
+        StreamCase{"VolumeChangedWhilePlaying",
+                   {{0, {{kRunning, kOn}, {kVolume, 0.5}}}, {3, {{kVolume, 0.8}}}, {10, {{kRunning, kOff}}}},
+                   {"3@0.5", "7@0.8"}},
+        StreamCase{
+            "VolumeChangedToTheSameNumberAsText",
+            {{0, {{kRunning, kOn}, {kVolume, 0.5}}}, {3, {{kVolume, "0.50"}}}, {10, {{kRunning, kOff}}}},
+            {"10@0.50"}},
+        StreamCase{"VolumeChangedWhileSilent",
+                   {{0, {{kRunning, kOn}, {kVolume, 0.5}}},
+                    {3, {{kRunning, kOff}}},
+                    {4, {{kVolume, 0.8}}},
+                    {5, {{kRunning, kOn}}},
+                    {7, {{kRunning, kOff}}}},
+                   {"3@0.5", "2@0.8"}},
+        StreamCase{"VolumeCameAfterTheStart",  // the stretch has no volume until then, so it goes on
+                   {{0, {{kRunning, kOn}}}, {3, {{kVolume, 0.5}}}, {10, {{kRunning, kOff}}}},
+                   {"10@0.5"}},
+        StreamCase{"WithoutAVolume", {{0, {{kRunning, kOn}}}, {10, {{kRunning, kOff}}}}, {}},
+        StreamCase{"StoppedWithANewVolume",  // the closing message's context is the next stretch's
+                   {{0, {{kRunning, kOn}, {kVolume, 0.5}}}, {10, {{kRunning, kOff}, {kVolume, 0.9}}}},
+                   {"10@0.5"}},
+        StreamCase{"StartedAgainWhilePlaying",
+                   {{0, {{kRunning, kOn}, {kVolume, 0.5}}}, {4, {{kRunning, kOn}}}, {10, {{kRunning, kOff}}}},
+                   {"10@0.5"}},
+        StreamCase{"EndedByTheSessionsDuration",
+                   {{0, {{kRunning, kOn}, {kVolume, 0.5}}}, {10, {{"session_duration", 10.0}}}},
+                   {"10@0.5"}},
+        StreamCase{"DurationSaysStillRunning",  // a stretch closes and the next one begins
+                   {{0, {{kRunning, kOn}, {kVolume, 0.5}}},
+                    {10, {{"session_duration", 10.0}, {kRunning, kOn}}},
+                    {12, {{kRunning, kOff}}}},
+                   {"10@0.5", "2@0.5"}},
+        StreamCase{"DevicesChanged",
+                   {{0, {{kRunning, kOn}, {kVolume, 0.5}, {"active_devices", "Speaker"}}},
+                    {4, {{"active_devices", "Headphones"}}},
+                    {10, {{kRunning, kOff}}}},
+                   {"4@0.5", "6@0.5"}},
+        StreamCase{"SelectedFormatChanged",
+                   {{0, {{kRunning, kOn}, {kVolume, 0.5}, {"session_selected_format", "A"}}},
+                    {4, {{"session_selected_format", "B"}}},
+                    {10, {{kRunning, kOff}}}},
+                   {"4@0.5", "6@0.5"}},
+        StreamCase{"SpatialisationChanged",
+                   {{0, {{kRunning, kOn}, {kVolume, 0.5}}},
+                    {4, {{"spatializationEnabled", true}}},
+                    {10, {{kRunning, kOff}}}},
+                   {"4@0.5", "6@0.5"}},
+        StreamCase{
+            "RingerChanged",
+            {{0, {{kRunning, kOn}, {kVolume, 0.5}}}, {4, {{"ringerstate", 1}}}, {10, {{kRunning, kOff}}}},
+            {"4@0.5", "6@0.5"}},
+        StreamCase{"OnlyCarriedContextChanged",
+                   {{0, {{kRunning, kOn}, {kVolume, 0.5}}},
+                    {2, {{"mFormatID", "aac"}}},
+                    {4, {{"mChannelsPerFrame", 2}}},
+                    {6, {{"spatial-audio-accessory-feature", true}}},
+                    {10, {{kRunning, kOff}}}},
+                   {"10@0.5"}},
+        StreamCase{"ShortStretchesInBetween",
+                   {{0, {{kRunning, kOn}, {kVolume, 0.1}}},
+                    {2, {{kVolume, 0.2}}},
+                    {2.25, {{kVolume, 0.3}}},
+                    {5.25, {{kRunning, kOff}}}},
+                   {"2@0.1", "3@0.3"}},
+        StreamCase{"TimesGoBack", {{10, {{kRunning, kOn}, {kVolume, 0.5}}}, {2, {{kRunning, kOff}}}}, {}}),
+    [](const auto& tested) { return tested.param.name; });
+
+TEST_F(VolumeMessagesTest, ASummaryHoldsTheContextOfTheClosingStretch) {
+  const auto summaries = summariesOf(stream({{0,
+                                              {{kRunning, kOn},
+                                               {kVolume, 0.3},
+                                               {"active_devices", "Speaker"},
+                                               {"session_selected_format", "48 kHz"},
+                                               {"mFormatID", "lpcm"},
+                                               {"mChannelsPerFrame", 2},
+                                               {"ringerstate", true}}},
+                                             {42, {{kRunning, kOff}, {"mFormatID", "later"}}}}));
+  ASSERT_THAT(summaries, SizeIs(1));
+  EXPECT_EQ(summaries[0]->category, 14U);
+  EXPECT_EQ(summaries[0]->type, 11);
+  EXPECT_EQ(
+      summaries[0]->message.text(),
+      R"({"session_selected_format":"48 kHz","mFormatID":"lpcm","active_devices":"Speaker",)"
+      R"("HostApplicationDisplayID":"com.orvane.player","QMSessionVolume":0.3,)"
+      R"("QMSessionVolumeBucketed":"0.3125","play_seconds":42.0,"spatial-audio-accessory-feature":false,)"
+      R"("spatializationEnabled":false,"ringerstate":true,"mChannelsPerFrame":2,"play_secondsBucketed":"30",)"
+      R"("msgidx":1,"msgcnt":1})");
+}
+
+TEST_F(VolumeMessagesTest, WhatIsNotKnownHasItsDefault) {
+  const auto summaries = summariesOf(stream({{0, {{kRunning, kOn}, {kVolume, 1}}}, {1, {{kRunning, kOff}}}}));
+  ASSERT_THAT(summaries, SizeIs(1));
+  const ValueMap& summary = summaries[0]->message;
+  EXPECT_EQ(summary.text("session_selected_format"), "unknown");
+  EXPECT_EQ(summary.text("active_devices"), "unknown");
+  EXPECT_EQ(summary.text("mFormatID"), "unknown");
+  EXPECT_EQ(summary.integer("mChannelsPerFrame"), -1);
+  EXPECT_EQ(*summary.find("ringerstate"), Value(false));
+  EXPECT_EQ(summary.text("QMSessionVolumeBucketed"), "1.0");
+  EXPECT_EQ(summary.text("play_secondsBucketed"), "1");
+}
+
+TEST_F(VolumeMessagesTest, SummariesAreNumberedAndCounted) {
+  const auto summaries = summariesOf(
+      stream({{0, {{kRunning, kOn}, {kVolume, 0.5}}}, {3, {{kVolume, 0.8}}}, {10, {{kRunning, kOff}}}}));
+  EXPECT_THAT(textsUnder("msgidx", summaries), ElementsAre("1", "2"));
+  EXPECT_THAT(textsUnder("msgcnt", summaries), ElementsAre("2", "2"));
+  EXPECT_EQ(summaries[0]->message.find("msgcnt")->kind(), Value::Kind::kUnsigned);
+}
+
+TEST_F(VolumeMessagesTest, PlaySecondsHaveSinglePrecision) {
+  const auto summaries =
+      summariesOf(stream({{0, {{kRunning, kOn}, {kVolume, 0.5}}}, {1.1, {{kRunning, kOff}}}}));
+  ASSERT_THAT(summaries, SizeIs(1));
+  EXPECT_EQ(summaries[0]->message.number("play_seconds"), static_cast<double>(1.1F));
+}
+
+TEST_F(VolumeMessagesTest, WithoutAProcessThereIsNoSummary) {
+  const TWReportingSessionVolumeMessagesWorker worker(session);
+  EXPECT_THAT(worker.createVolumeMessages(
+                  stream({{0, {{kRunning, kOn}, {kVolume, 0.5}}}, {10, {{kRunning, kOff}}}}), nullptr, 0.5),
+              IsEmpty());
+}
+
+TEST_F(VolumeMessagesTest, WithoutTimesThereIsNoSummary) {
+  EXPECT_THAT(summariesOf({message({{kRunning, kOn}, {kVolume, 0.5}}), messageAt(10, {{kRunning, kOff}})}),
+              IsEmpty());
+  EXPECT_THAT(summariesOf({messageAt(0, {{kRunning, kOn}, {kVolume, 0.5}}), message({{kRunning, kOff}})}),
+              IsEmpty());
+  EXPECT_THAT(summariesOf({messageAt(0, {{kRunning, kOn}, {kVolume, 0.5}}),
+                           messageAt(std::nan(""), {{kRunning, kOff}})}),
+              IsEmpty());
+}
+
+TEST_F(VolumeMessagesTest, AnOpenStretchInThePreviousValuesYieldsNoSummaryByItself) {
+  session->addPreviousValues({{kRunning, kOn}, {kVolume, 0.5}, {"twreporting_timestamp", 0.0}});
+  EXPECT_THAT(playedIn({{10, {{kRunning, kOff}}}}), IsEmpty());
+}
+
+TEST_F(VolumeMessagesTest, TheWalkBeginsWithThePreviousValues) {
+  session->addPreviousValues({{kVolume, 0.25}, {"active_devices", "Headphones"}});
+  const auto summaries = summariesOf(stream({{0, {{kRunning, kOn}}}, {5, {{kRunning, kOff}}}}));
+  ASSERT_THAT(summaries, SizeIs(1));
+  EXPECT_EQ(summaries[0]->message.text("active_devices"), "Headphones");
+  EXPECT_EQ(summaries[0]->message.number("QMSessionVolume"), 0.25);
+}
+
+TEST_F(VolumeMessagesTest, RapidSpatialMessagesAreMergedIntoTheFirst) {
+  const auto messages = stream({{0, {{kRunning, kOn}, {kVolume, 0.5}}},
+                                {2, {{"spatial-audio-accessory-feature", true}}},
+                                {6, {{"spatializationEnabled", true}}},
+                                {10, {{kRunning, kOff}}}});
+  const auto summaries = summariesOf(messages);
+  EXPECT_THAT(textsUnder("play_seconds", summaries), ElementsAre("6", "4"));  // at the merged message's time
+  EXPECT_EQ(messages[1]->message.boolean("spatializationEnabled"), true);     // the session's own record
+}
+
+TEST_F(VolumeMessagesTest, SpatialMessagesFiveSecondsApartAreNot) {
+  const auto summaries = summariesOf(stream({{0, {{kRunning, kOn}, {kVolume, 0.5}}},
+                                             {2, {{"spatial-audio-accessory-feature", true}}},
+                                             {7, {{"spatializationEnabled", true}}},
+                                             {10, {{kRunning, kOff}}}}));
+  EXPECT_THAT(textsUnder("play_seconds", summaries), ElementsAre("7", "3"));
+}
+
+TEST_F(VolumeMessagesTest, StopSendsTheSummariesIntoTheSession) {
+  const ValueMap configuration{{"HostApplicationDisplayID", "com.orvane.player"}};
+  session->updateConfigurationWithContentsOfConfiguration(&configuration);
+  session->start();
+  const double now = test.clock.now();
+  session->sendMessage(messageAt(now + 3, {{kRunning, kOff}}));
+  session->sendMessage(messageAt(now, {{kRunning, kOn}, {kVolume, 0.5}}));
+  session->stop();
+  const auto events = test.metricon.eventsNamed("com.orvane.tonewerk.Volume.Summary");
+  ASSERT_THAT(events, SizeIs(1));
+  EXPECT_EQ(events[0].number("play_seconds"), 3.0);
+  EXPECT_EQ(events[0].text("HostApplicationDisplayID"), "com.orvane.player");
+  EXPECT_EQ(events[0].text("audiotag"), "VolumeSummary");
+  EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kDefault),
+              ElementsAre("sending volume event for reporter 77"));
+}
+
+TEST_F(VolumeMessagesTest, AStopWithoutSummariesSendsAndSaysNothing) {
+  session->start();
+  session->stop();
+  EXPECT_THAT(test.metricon.events(), IsEmpty());
+  EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kDefault), IsEmpty());
+}
+
+TEST_F(VolumeMessagesTest, SaysWhatItDoesWithEachStretch) {
+  test.log.clear();
+  playedIn({{0, {{kRunning, kOn}, {kVolume, 0.5}}}, {2, {{kVolume, 0.75}}}, {2.25, {{kRunning, kOff}}}});
+  EXPECT_THAT(
+      test.log.textsOf("twrr", LogLevel::kDebug),
+      ElementsAre("entering createVolumeMessages createVolumeMessages",
+                  "playingTime { func=createVolumeMessages, playingTime=2.000000, twTimestamp=2, "
+                  "twTimestamp_double=2.000000, startTwTimestamp=0, startTwTimestamp_double=0.000000 }",
+                  "added volume message { func=createVolumeMessages, action=add, count=1 }",
+                  StartsWith("playingTime { func=createVolumeMessages, playingTime=0.250000,"),
+                  "skipped volume message, too short { func=createVolumeMessages, action=skip, count=1 }"));
+}
+
+// Whatever a stream holds, the walk neither crashes nor reads the clock, and changes the stored messages by
+// nothing but the merging of rapid ones.
+RC_GTEST_FIXTURE_PROP(VolumeMessagesTest, SurvivesAnyStream, ()) {
+  const auto anyValue = rc::gen::oneOf(
+      rc::gen::map(rc::gen::arbitrary<bool>(), [](bool b) { return Value(b); }),
+      rc::gen::map(rc::gen::arbitrary<double>(), [](double d) { return Value(d); }),
+      rc::gen::map(rc::gen::inRange(-1, 3), [](int i) { return Value(i); }), rc::gen::just(Value("text")),
+      rc::gen::just(Value(ValueArray{1})), rc::gen::just(Value(std::nan(""))));
+  const auto anyKey = rc::gen::elementOf(
+      std::vector<std::string>{kRunning, kVolume, "session_duration", "twreporting_timestamp",
+                               "active_devices", "spatializationEnabled", "spatial-audio-accessory-feature",
+                               "ringerstate", "mFormatID", "session_selected_format", "other"});
+  TWReportingSessionMessages messages;
+  std::vector<ValueMap> before;
+  const auto size = *rc::gen::inRange(0, 20);
+  for (int n = 0; n < size; ++n) {
+    ValueMap payload;
+    for (int k = *rc::gen::inRange(0, 5); k > 0; --k) payload.set(*anyKey, *anyValue);
+    messages.push_back(message(payload));
+    before.push_back(payload);
+  }
+  const auto summaries = summariesOf(messages);
+  for (std::size_t n = 0; n < messages.size(); ++n) {
+    const bool mayMerge =
+        before[n].contains("spatializationEnabled") || before[n].contains("spatial-audio-accessory-feature");
+    if (!mayMerge) RC_ASSERT(messages[n]->message == before[n]);
+    for (const auto& entry : before[n]) RC_ASSERT(messages[n]->message.contains(entry.key));
+  }
+  for (const auto& summary : summaries) {
+    RC_ASSERT(summary->message.number("play_seconds") > 0.5);
+    RC_ASSERT(summary->message.size() == 14U);
+    RC_ASSERT(summary->message.integer("msgcnt") == static_cast<std::int64_t>(summaries.size()));
+  }
+}
+
+}  // namespace
+}  // namespace tonewerk

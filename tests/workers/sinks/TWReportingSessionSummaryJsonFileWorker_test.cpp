@@ -1,0 +1,283 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "workers/sinks/TWReportingSessionSummaryJsonFileWorker.h"
+
+#include <cmath>
+#include <gtest/gtest.h>
+#include <nlohmann/json.hpp>
+
+#include "support/ReportingTest.h"
+#include "workers/sinks/TWReportingSessionSummaryWorker.h"
+
+namespace tonewerk {
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::HasSubstr;
+using ::testing::IsEmpty;
+using ::testing::SizeIs;
+using ::testing::StartsWith;
+
+constexpr char kDirectory[] = "/logs/Audio/Reporting";
+constexpr char kPath[] = "/logs/Audio/Reporting/20251120-111800+0100-77-Unknown-test.json";
+
+class TWReportingSessionSummaryJsonFileWorkerTest : public ReportingTest {
+ protected:
+  TWReportingSessionSummaryJsonFileWorkerTest()
+      : ReportingTest({&TWReportingSessionSummaryJsonFileWorker::kWorkerClass}) {
+    test.clock.setUtcOffset(std::chrono::minutes(60));
+    session = makeSession(77);
+    session->setServiceType(11);
+  }
+
+  void send(const ValueMap& payload, AudioEventCategory category = 4, AudioEventType type = 1) {
+    test.clock.advance(1.0);
+    ValueMap stamped = payload;
+    stamped.set("twreporting_timestamp", test.clock.now());
+    session->sendMessage(message(stamped, category, type));
+  }
+
+  void stop() {
+    test.clock.setNow(ManualClock::kStart);
+    session->stop();
+    context->fileSinkQueue().drain();
+  }
+
+  // The names of the file's entries, in order.
+  std::vector<std::string> memberNames(const std::string& path = kPath) {
+    std::vector<std::string> names;
+    for (const auto& entry : nlohmann::json::parse(test.files.contents(path).value_or("[]"))) {
+      EXPECT_EQ(entry.size(), 1U);
+      names.push_back(entry.begin().key());
+    }
+    return names;
+  }
+
+  std::shared_ptr<TWReportingSession> session;
+};
+
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, IsNeitherProducerNorConsumer) {
+  const auto& workerClass = TWReportingSessionSummaryJsonFileWorker::kWorkerClass;
+  EXPECT_FALSE(workerClass.isProducer);
+  EXPECT_FALSE(workerClass.isConsumer);
+}
+
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, OutsideInternalBuildsOnlyTestSessionsGetAFile) {
+  for (int service = 0; service <= 14; ++service) {
+    session->setServiceType(static_cast<AudioServiceType>(service));
+    EXPECT_EQ(TWReportingSessionSummaryJsonFileWorker::initWithSession(session) != nullptr, service == 11)
+        << service;
+  }
+}
+
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, OnInternalBuildsEverySessionGetsAFile) {
+  makeInternalBuild();
+  for (int service = 0; service <= 14; ++service) {
+    session->setServiceType(static_cast<AudioServiceType>(service));
+    const auto worker = TWReportingSessionSummaryJsonFileWorker::initWithSession(session);
+    ASSERT_NE(worker, nullptr);
+    EXPECT_TRUE(worker->started);
+  }
+}
+
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, WritesAnArrayOfOneMemberObjectsLineByLine) {
+  session->start();
+  send({{"a", 1}});
+  stop();
+  EXPECT_THAT(test.files.files(), ElementsAre(kPath));
+  const std::string text = test.files.contents(kPath).value();
+  std::vector<std::string> lines;
+  for (std::size_t at = 0; at < text.size(); at = text.find('\n', at) + 1) {
+    lines.push_back(text.substr(at, text.find('\n', at) - at));
+  }
+  EXPECT_EQ(lines.front(), "[");
+  EXPECT_EQ(lines[1], "{");  // each object indented over several lines
+  EXPECT_THAT(lines[2], HasSubstr("\"Setup_Start_1\": {"));
+  EXPECT_EQ(std::count(lines.begin(), lines.end(), ","), 2);
+  EXPECT_EQ(lines.back(), "]");
+  EXPECT_EQ(text.back(), '\n');
+  EXPECT_THAT(memberNames(), ElementsAre("Setup_Start_1", "Setup_Stop_1", "Playback_Start_1"));
+}
+
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, CountsEachCategoryAndTypeFromOne) {
+  session->start();
+  send({{"a", 1}}, 14, 0);
+  send({{"a", 2}}, 14, 0);
+  send({{"a", 3}}, 14, 0);
+  send({{"a", 1}}, 14, 1);
+  stop();
+  EXPECT_THAT(memberNames(), ElementsAre("Setup_Start_1", "Setup_Stop_1", "Volume_Generic_1",
+                                         "Volume_Generic_2", "Volume_Generic_3", "Volume_Start_1"));
+}
+
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, TwoCategoriesOfOneTextShareACount) {
+  session->start();
+  send({{"a", 1}}, 0x00030001, 0);
+  send({{"a", 1}}, 0x01000001, 0);
+  stop();
+  EXPECT_THAT(memberNames(),
+              ElementsAre("Setup_Start_1", "Setup_Stop_1", "_Generic_Generic_1", "_Generic_Generic_2"));
+}
+
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, EachPayloadSaysWhetherItsSessionWasStarted) {
+  const auto before = message({{"a", "before"}});
+  session->sendMessage(before);
+  session->start();
+  const auto after = message({{"a", "after"}});
+  session->sendMessage(after);
+  stop();
+  EXPECT_EQ(before->message.text("isSessionStarted"), "NO");  // the stored messages themselves
+  EXPECT_EQ(after->message.text("isSessionStarted"), "YES");
+  EXPECT_THAT(test.files.contents(kPath).value(), HasSubstr("\"isSessionStarted\": \"YES\""));
+}
+
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, HoldsWhatTheProducersAdded) {
+  useWorkers({&TWReportingSessionSummaryWorker::kWorkerClass,
+              &TWReportingSessionSummaryJsonFileWorker::kWorkerClass});
+  session = makeSession(77);
+  session->setServiceType(11);
+  session->start();
+  stop();
+  EXPECT_THAT(memberNames(), ElementsAre("Setup_Start_1", "Setup_Stop_1", "Session_Generic_Summary_1"));
+}
+
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, MakesItsDirectoryForEverybody) {
+  session->start();
+  stop();
+  EXPECT_EQ(test.files.directoryMode(kDirectory), 0777U);
+}
+
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, NamesTheFileByTimeIdentifierApplicationAndService) {
+  const ValueMap configuration{{"HostApplicationDisplayID", "my app"}};
+  session->updateConfigurationWithContentsOfConfiguration(&configuration);
+  session->setServiceType(7);
+  EXPECT_EQ(TWReportingSessionSummaryJsonFileWorker::fileNameFor(*session),
+            "20251120-111800+0100-77-my app-longformaudio.json");
+}
+
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, ANameThatWouldLeaveTheDirectoryFailsAndIsLogged) {
+  const ValueMap configuration{{"HostApplicationDisplayID", "../../evil"}};
+  session->updateConfigurationWithContentsOfConfiguration(&configuration);
+  session->start();
+  stop();
+  EXPECT_THAT(test.files.files(), IsEmpty());
+  EXPECT_THAT(
+      test.log.textsOf("twru", LogLevel::kError),
+      ElementsAre(StartsWith("SummaryJsonFileWorker failed to open file. action=open file=" +
+                             std::string(kDirectory) + "/20251120-111800+0100-77-../../evil-test.json")));
+}
+
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, EachStopWritesAFileOfItsOwn) {
+  session->start();
+  stop();
+  session->start();
+  test.clock.advance(1.0);
+  session->stop();
+  context->fileSinkQueue().drain();
+  EXPECT_THAT(test.files.files(), SizeIs(2));
+}
+
+// A producer that leaves only redundant messages behind.
+class RedundantOnly final : public TWReportingSessionWorkerProducerProtocol {
+ public:
+  static const TWReportingSessionWorkerClass kWorkerClass;
+  const TWReportingSessionWorkerClass& workerClass() const override { return kWorkerClass; }
+  explicit RedundantOnly(const std::shared_ptr<TWReportingSession>& owner) { session = owner; }
+  void stop() override {
+    for (const auto& record : session.lock()->messages()) record->isRedundant = true;
+  }
+};
+const TWReportingSessionWorkerClass RedundantOnly::kWorkerClass =
+    workerClassOf<RedundantOnly>("RedundantOnly");
+
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, WithOnlyRedundantMessagesNoFileIsWrittenButClosed) {
+  useWorkers({&RedundantOnly::kWorkerClass, &TWReportingSessionSummaryJsonFileWorker::kWorkerClass});
+  session = makeSession(77);
+  session->setServiceType(11);
+  session->start();
+  stop();
+  EXPECT_THAT(test.files.files(), IsEmpty());
+  EXPECT_EQ(test.files.directoryMode(kDirectory), std::nullopt);
+  EXPECT_THAT(test.log.textsOf("twru", LogLevel::kInfo),
+              ElementsAre("SummaryJsonFileWorker closed file. action=close file="));
+}
+
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, LogsOpeningAndClosing) {
+  session->start();
+  stop();
+  EXPECT_THAT(test.log.textsOf("twru"),
+              ElementsAre("SummaryJsonFileWorker opened file. action=open file=" + std::string(kPath),
+                          "SummaryJsonFileWorker closed file. action=close file=" + std::string(kPath)));
+  EXPECT_THAT(test.log.linesOf("twru", LogLevel::kInfo), SizeIs(2));
+  EXPECT_EQ(test.files.openFiles(), 0);
+}
+
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest,
+       ADirectoryThatCannotBeMadeIsLoggedAndTheFileTriedAllTheSame) {
+  test.files.failCreateDirectories(std::errc::permission_denied);
+  session->start();
+  stop();
+  const auto errors = test.log.textsOf("twru", LogLevel::kError);
+  ASSERT_THAT(errors, SizeIs(2));
+  EXPECT_EQ(errors[0], "can't create logging directory at " + std::string(kDirectory) + ": " +
+                           std::make_error_code(std::errc::permission_denied).message());
+  EXPECT_THAT(errors[1], StartsWith("SummaryJsonFileWorker failed to open file."));
+}
+
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, AFileThatCannotBeOpenedIsLoggedOnceAndTheSessionLivesOn) {
+  test.files.failCreateFile(std::errc::no_space_on_device);
+  session->start();
+  send({{"a", 1}});
+  stop();
+  EXPECT_THAT(
+      test.log.textsOf("twru", LogLevel::kError),
+      ElementsAre("SummaryJsonFileWorker failed to open file. action=open file=" + std::string(kPath) +
+                  " error=\"" + std::make_error_code(std::errc::no_space_on_device).message() + "\""));
+  test.files.failCreateFile(std::errc());
+  session->start();
+  stop();
+  EXPECT_THAT(test.files.files(), ElementsAre(kPath));
+}
+
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, OnlyAFailedLineEndIsReported) {
+  test.files.failWrite(1, std::errc::no_space_on_device);  // the text of the first line
+  session->start();
+  stop();
+  EXPECT_THAT(test.log.textsOf("twru", LogLevel::kError), IsEmpty());
+
+  test.files.failWrite(2, std::errc::no_space_on_device);  // its end
+  session->start();
+  stop();
+  EXPECT_THAT(
+      test.log.textsOf("twru", LogLevel::kError),
+      ElementsAre("SummaryJsonFileWorker failed to write line. action=writeline file=" + std::string(kPath) +
+                  " error=\"" + std::make_error_code(std::errc::no_space_on_device).message() + "\""));
+}
+
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, AFailedCloseIsLogged) {
+  test.files.failClose(std::errc::io_error);
+  session->start();
+  stop();
+  EXPECT_THAT(
+      test.log.textsOf("twru", LogLevel::kError),
+      ElementsAre("SummaryJsonFileWorker failed to closed file. action=close file=" + std::string(kPath) +
+                  " error=\"" + std::make_error_code(std::errc::io_error).message() + "\""));
+}
+
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, APayloadThatJsonCannotSayLeavesAnEmptyEntryAndIsLogged) {
+  session->start();
+  send({{"bad", std::nan("")}});
+  stop();
+  EXPECT_THAT(test.log.textsOf("twru", LogLevel::kError), ElementsAre(StartsWith("dataWithJSONObject: ")));
+  EXPECT_THAT(test.files.contents(kPath).value(), HasSubstr("\n,\n\n]\n"));
+}
+
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, TheFileIsWrittenOffTheWorkQueue) {
+  session->start();
+  session->stop();
+  EXPECT_THAT(test.files.files(), IsEmpty());
+  context->fileSinkQueue().drain();
+  EXPECT_THAT(test.files.files(), SizeIs(1));
+}
+
+}  // namespace
+}  // namespace tonewerk
