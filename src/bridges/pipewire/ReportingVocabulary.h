@@ -1,0 +1,38 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstdint>
+#include <string_view>
+
+// The words of the reporting protocol that this bridge speaks: a client knows them as numbers and texts on
+// the wire.
+namespace tonewerk {
+
+namespace service {
+inline constexpr std::uint16_t kTelephony = 2;
+inline constexpr std::uint16_t kAlarms = 4;
+inline constexpr std::uint16_t kLongFormAudio = 7;
+inline constexpr std::uint16_t kNonLongFormAudio = 8;
+inline constexpr std::uint16_t kAlerts = 10;
+inline constexpr std::uint16_t kTest = 11;
+inline constexpr std::uint16_t kSystemSounds = 13;
+}  // namespace service
+
+inline constexpr std::uint32_t kOutputCategory = 5;
+inline constexpr std::uint16_t kGenericType = 0;
+inline constexpr std::uint16_t kStopType = 2;
+
+// Keys of a session's configuration.
+inline constexpr std::string_view kApplicationKey = "HostApplicationDisplayID";
+
+// Keys of messages.
+inline constexpr std::string_view kTimestampKey = "twreporting_timestamp";   // seconds since 1970
+inline constexpr std::string_view kRunningKey = "session_output_running";    // boolean
+inline constexpr std::string_view kVolumeKey = "QMSessionVolume";            // 0 to 1
+inline constexpr std::string_view kDevicesKey = "active_devices";            // text
+inline constexpr std::string_view kFormatKey = "session_selected_format";    // text
+inline constexpr std::string_view kFormatIDKey = "mFormatID";                // text
+inline constexpr std::string_view kChannelsKey = "mChannelsPerFrame";        // integer
+inline constexpr std::string_view kSessionDurationKey = "session_duration";  // seconds
+
+}  // namespace tonewerk

@@ -1,0 +1,37 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstdint>
+#include <map>
+#include <memory>
+
+#include "bridges/pipewire/EventLoop.h"
+#include "bridges/pipewire/GraphModel.h"
+#include "bridges/pipewire/StreamReporter.h"
+
+namespace tonewerk {
+
+// One StreamReporter for each stream of the graph, and the one timer they share. For the loop's thread.
+class StreamReports final : public StreamObserver {
+ public:
+  // All outlive this.
+  StreamReports(SessionSink& sink, const Clock& clock, ReporterIdentifiers& identifiers, EventLoop& loop);
+
+  void streamChanged(std::uint32_t stream, const StreamState& state) override;
+  void streamGone(std::uint32_t stream) override;
+
+  // The daemon has lost what it knew: every stream's session begins anew.
+  void restartAll();
+
+ private:
+  void deadlinesReached();
+  void rearm();
+
+  SessionSink& sink_;
+  const Clock& clock_;
+  ReporterIdentifiers& identifiers_;
+  std::map<std::uint32_t, StreamReporter> reporters_;
+  std::unique_ptr<EventLoop::Timer> timer_;  // last: its callback uses the others
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,40 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <chrono>
+#include <list>
+#include <memory>
+
+#include "bridges/pipewire/EventLoop.h"
+#include "support/ManualClock.h"
+
+namespace tonewerk {
+
+// An event loop whose timers follow a clock that tests move, and whose descriptors are looked at when a test
+// says so. Outlives what it made.
+class ManualEventLoop final : public EventLoop, private ManualClock::Alarm {
+ public:
+  explicit ManualEventLoop(ManualClock& clock);
+  ~ManualEventLoop() override;
+
+  std::unique_ptr<Source> watch(int descriptor, std::function<void()> onReadable) override;
+  std::unique_ptr<Timer> makeTimer(std::function<void()> onExpired) override;
+
+  // Waits, for seconds at most, until a watched descriptor is readable, and runs its callback. False when
+  // none was.
+  bool runReadable();
+
+ private:
+  class ManualSource;
+  class ManualTimer;
+
+  std::optional<std::chrono::nanoseconds> nextDue() const override;
+  void runNext() override;
+  ManualTimer* earliest() const;
+
+  ManualClock& clock_;
+  std::list<ManualSource*> sources_;
+  std::list<ManualTimer*> timers_;
+};
+
+}  // namespace tonewerk
