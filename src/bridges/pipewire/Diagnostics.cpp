@@ -1,0 +1,16 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "bridges/pipewire/Diagnostics.h"
+
+#include <cstdio>
+
+namespace tonewerk {
+
+void Diagnostics::say(std::string_view line) const {
+  std::fprintf(stderr, "tw-pipewire: %.*s\n", static_cast<int>(line.size()), line.data());
+}
+
+void Diagnostics::detail(std::string_view line) const {
+  if (verbose_) say(line);
+}
+
+}  // namespace tonewerk
