@@ -1,12 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "bridges/pipewire/Diagnostics.h"
 
-#include <cstdio>
-
 namespace tonewerk {
 
 void Diagnostics::say(std::string_view line) const {
-  std::fprintf(stderr, "tw-pipewire: %.*s\n", static_cast<int>(line.size()), line.data());
+  std::fprintf(out_, "tw-pipewire: %.*s\n", static_cast<int>(line.size()), line.data());
 }
 
 void Diagnostics::detail(std::string_view line) const {

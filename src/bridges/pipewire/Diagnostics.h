@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <cstdio>
 #include <string_view>
 
 namespace tonewerk {
@@ -8,7 +9,8 @@ namespace tonewerk {
 // What the bridge tells the person who runs it: lines on standard error.
 class Diagnostics {
  public:
-  explicit Diagnostics(bool verbose) : verbose_(verbose) {}
+  // `out` outlives this.
+  explicit Diagnostics(bool verbose, std::FILE* out = stderr) : verbose_(verbose), out_(out) {}
 
   // What anybody should know: a peer that came or went, a request that was refused.
   void say(std::string_view line) const;
@@ -18,6 +20,7 @@ class Diagnostics {
 
  private:
   bool verbose_;
+  std::FILE* out_;
 };
 
 }  // namespace tonewerk

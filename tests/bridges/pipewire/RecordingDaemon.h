@@ -1,0 +1,108 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <chrono>
+#include <condition_variable>
+#include <functional>
+#include <memory>
+#include <mutex>
+#include <optional>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "platform/LogCategory.h"
+#include "platform/linux/UnixSocketListener.h"
+#include "service/TWReportingServiceExport.h"
+#include "support/MemoryLog.h"
+
+namespace tonewerk {
+
+// The daemon's request set on a real socket with nothing behind it, for a client's test to see what arrives.
+// Answers true, a start never.
+class RecordingDaemon final : private MessagingListenerDelegate {
+ public:
+  struct Request {
+    std::string method;
+    Arguments arguments;
+  };
+
+  explicit RecordingDaemon(const std::string& path) {
+    std::string problem;
+    std::unique_ptr<ServerSocket> socket = ServerSocket::open(path, problem);
+    if (socket == nullptr) return;
+    listener_ = std::make_unique<UnixSocketListener>(std::move(socket), category_);
+    listener_->setDelegate(*this);
+    listener_->resume();
+  }
+  RecordingDaemon(const RecordingDaemon&) = delete;
+  RecordingDaemon& operator=(const RecordingDaemon&) = delete;
+  ~RecordingDaemon() override {
+    if (listener_ != nullptr) listener_->shutDown();
+  }
+
+  bool isListening() const { return listener_ != nullptr; }
+
+  // From now on every request but getAllReporters is answered with this error.
+  void refuse(ReplyError error) {
+    const std::lock_guard lock(mutex_);
+    refusal_ = std::move(error);
+  }
+
+  std::vector<Request> requests() const {
+    const std::lock_guard lock(mutex_);
+    return requests_;
+  }
+  std::vector<std::string> methods() const {
+    std::vector<std::string> methods;
+    for (const Request& request : requests()) methods.push_back(request.method);
+    return methods;
+  }
+  bool waitForRequests(std::size_t count) const {
+    std::unique_lock lock(mutex_);
+    return changed_.wait_for(lock, std::chrono::seconds(30), [&] { return requests_.size() >= count; });
+  }
+
+ private:
+  class Object final : public ExportedObject {
+   public:
+    explicit Object(RecordingDaemon& daemon) : daemon_(daemon) {}
+    void handleRequest(std::size_t method, Arguments arguments, Reply reply, RequestToken) override {
+      daemon_.handle(method, std::move(arguments), reply);
+    }
+
+   private:
+    RecordingDaemon& daemon_;
+  };
+
+  static const ExportedInterface& interface() { return TWReportingServiceExport::exportedInterface(); }
+
+  bool listenerShouldAcceptNewConnection(MessagingConnection& connection) override {
+    connection.exportObject(interface(), std::make_shared<Object>(*this));
+    connection.resume();
+    return true;
+  }
+
+  void handle(std::size_t method, Arguments arguments, const Reply& reply) {
+    const std::string name(interface().methods[method].name);
+    std::optional<ReplyError> refusal;
+    {
+      const std::lock_guard lock(mutex_);
+      requests_.push_back({name, std::move(arguments)});
+      if (name != "getAllReporters") refusal = refusal_;
+      changed_.notify_all();
+    }
+    if (refusal) return reply(refusal);
+    if (name != "startReportingSessionForID") reply(std::nullopt, Value(true));
+  }
+
+  MemoryLog log_;
+  const LogCategory category_{log_, "com.orvane.tonewerk", "twrs"};
+  mutable std::mutex mutex_;
+  mutable std::condition_variable changed_;
+  std::vector<Request> requests_;      // under mutex_
+  std::optional<ReplyError> refusal_;  // under mutex_
+  std::unique_ptr<UnixSocketListener> listener_;
+};
+
+}  // namespace tonewerk
