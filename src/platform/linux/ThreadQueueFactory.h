@@ -1,0 +1,14 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include "platform/SerialQueue.h"
+
+namespace tonewerk {
+
+// Makes queues that have a thread each. Any thread.
+class ThreadQueueFactory final : public SerialQueueFactory {
+ public:
+  std::unique_ptr<SerialQueue> makeSerialQueue(std::string name, QueuePriority priority) override;
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,35 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <memory>
+#include <thread>
+
+#include "platform/TimerService.h"
+
+namespace tonewerk {
+
+// Timers on one thread, which sleeps until the next tick is due. Time is the monotonic clock's, which stands
+// still while the device sleeps.
+//
+// repeat() from any thread, also from inside a tick. Timers may outlive the service; they are then silent.
+// The service is not destroyed from a tick.
+class TimerThread final : public TimerService {
+ public:
+  TimerThread();
+  TimerThread(const TimerThread&) = delete;
+  TimerThread& operator=(const TimerThread&) = delete;
+  // Waits for a tick that is running.
+  ~TimerThread() override;
+
+  // `interval` is at least one millisecond.
+  std::unique_ptr<Timer> repeat(std::chrono::milliseconds interval, std::function<void()> tick) override;
+
+ private:
+  struct Schedule;
+  class ScheduledTimer;
+
+  std::shared_ptr<Schedule> schedule_;  // shared with the timers
+  std::thread thread_;                  // last: it uses the schedule
+};
+
+}  // namespace tonewerk
