@@ -1,0 +1,42 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/TextFile.h"
+
+#include <array>
+#include <cerrno>
+#include <fcntl.h>
+#include <unistd.h>
+
+#include "platform/linux/FileDescriptor.h"
+
+namespace tonewerk {
+namespace {
+
+constexpr std::size_t kMostBytes = std::size_t{16} << 20;
+
+}  // namespace
+
+std::error_code lastSystemError() { return {errno, std::generic_category()}; }
+
+std::error_code readTextFile(const std::string& path, std::string& text, struct stat* status) {
+  text.clear();
+  // Non-blocking, so that a pipe in the file's place cannot hold the caller.
+  const FileDescriptor file(open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
+  if (!file) return lastSystemError();
+  struct stat found {};
+  if (fstat(file.get(), &found) != 0) return lastSystemError();
+  if (S_ISDIR(found.st_mode)) return std::make_error_code(std::errc::is_a_directory);
+  if (!S_ISREG(found.st_mode)) return std::make_error_code(std::errc::invalid_argument);
+  if (status != nullptr) *status = found;
+
+  std::array<char, 4096> buffer;
+  for (;;) {
+    const ssize_t count = read(file.get(), buffer.data(), buffer.size());
+    if (count < 0 && errno == EINTR) continue;
+    if (count < 0) return lastSystemError();
+    if (count == 0) return {};
+    text.append(buffer.data(), static_cast<std::size_t>(count));
+    if (text.size() > kMostBytes) return std::make_error_code(std::errc::file_too_large);
+  }
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,18 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <string>
+#include <sys/stat.h>
+#include <system_error>
+
+namespace tonewerk {
+
+// Reads a whole file, at most 16 MiB of it (else std::errc::file_too_large). `status`, when it is not null,
+// is what the file was while it was read. Only regular files, which those under /proc and /sys are, too.
+[[nodiscard]] std::error_code readTextFile(const std::string& path, std::string& text,
+                                           struct stat* status = nullptr);
+
+// The error that the last failed system call of this thread left behind.
+std::error_code lastSystemError();
+
+}  // namespace tonewerk
