@@ -1,0 +1,57 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/LinuxPlatform.h"
+
+#include "platform/LogCategory.h"
+#include "platform/linux/Directories.h"
+#include "platform/linux/LinuxFileSystem.h"
+#include "platform/linux/LinuxProcessInformation.h"
+#include "platform/linux/LinuxSystemInformation.h"
+#include "platform/linux/NlohmannJsonService.h"
+#include "platform/linux/StandardLog.h"
+#include "platform/linux/SystemClock.h"
+#include "platform/linux/ThreadQueueFactory.h"
+#include "platform/linux/TimerThread.h"
+#include "platform/linux/TomlDeviceFacts.h"
+#include "platform/linux/TomlPreferenceStore.h"
+#include "platform/linux/UsdtTracePoints.h"
+
+namespace tonewerk {
+
+struct LinuxPlatform::Adapters {
+  explicit Adapters(const Directories& directories)
+      : deviceFacts(directories.configuration + "/device-facts.toml", category),
+        preferences(directories.configuration + "/preferences", directories.state + "/preferences",
+                    category) {}
+
+  SystemClock clock;
+  std::unique_ptr<Log> log = makeStandardLog(clock);
+  LogCategory category{*log, "com.orvane.tonewerk", "twrs"};  // the adapters' own lines
+  UsdtTracePoints tracePoints;
+  ThreadQueueFactory queues;
+  TimerThread timers;
+  LinuxProcessInformation processes;
+  LinuxSystemInformation system{clock};
+  TomlDeviceFacts deviceFacts;
+  TomlPreferenceStore preferences;
+  LinuxFileSystem files;
+  NlohmannJsonService json;
+};
+
+LinuxPlatform::LinuxPlatform(const Directories& directories)
+    : adapters_(std::make_unique<Adapters>(directories)) {}
+LinuxPlatform::~LinuxPlatform() = default;
+
+Log& LinuxPlatform::log() { return *adapters_->log; }
+Clock& LinuxPlatform::clock() { return adapters_->clock; }
+SerialQueueFactory& LinuxPlatform::queues() { return adapters_->queues; }
+TimerService& LinuxPlatform::timers() { return adapters_->timers; }
+PreferenceStore& LinuxPlatform::preferences() { return adapters_->preferences; }
+JsonService& LinuxPlatform::json() { return adapters_->json; }
+
+Platform LinuxPlatform::platform(Metricon& metricon) {
+  Adapters& a = *adapters_;
+  return {*a.log,   a.tracePoints, a.clock,       a.queues, a.timers, a.processes,
+          a.system, a.deviceFacts, a.preferences, a.files,  a.json,   metricon};
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,38 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <memory>
+
+#include "platform/Platform.h"
+
+namespace tonewerk {
+
+struct Directories;
+
+// One of each adapter, and the Platform made of them. Whoever makes it lets it outlive what uses the
+// Platform.
+//
+// Metricon is the caller's: its adapter needs the clock, the log and the preferences from here.
+class LinuxPlatform {
+ public:
+  explicit LinuxPlatform(const Directories& directories);
+  LinuxPlatform(const LinuxPlatform&) = delete;
+  LinuxPlatform& operator=(const LinuxPlatform&) = delete;
+  ~LinuxPlatform();
+
+  Log& log();
+  Clock& clock();
+  SerialQueueFactory& queues();
+  TimerService& timers();
+  PreferenceStore& preferences();
+  JsonService& json();
+
+  // `metricon` outlives what uses the result.
+  Platform platform(Metricon& metricon);
+
+ private:
+  struct Adapters;
+  std::unique_ptr<Adapters> adapters_;
+};
+
+}  // namespace tonewerk
