@@ -3,15 +3,14 @@
 
 #include <algorithm>
 #include <chrono>
-#include <cmath>
 #include <string>
 #include <utility>
 
 #include "platform/Clock.h"
 #include "platform/LogLine.h"
-#include "platform/Metricon.h"
 #include "platform/ProcessInformation.h"
 #include "platform/SerialQueue.h"
+#include "service/ClientUptime.h"
 #include "service/TWReportingClientServerInstance.h"
 #include "service/TWReportingServiceExport.h"
 #include "session/TWReportingContext.h"
@@ -24,15 +23,10 @@ namespace {
 
 constexpr ReporterID kSingleMessageReporterID = 1;
 constexpr std::chrono::milliseconds kReaperInterval{500};
-constexpr std::string_view kClientUptimeEvent = "com.orvane.tonewerk.twreportingclientuptime";
-constexpr std::string_view kUnknown = "unknown";
 
 const auto category = &TWReportingServiceDelegateCategory;
 
 double now() { return TWReportingContext::current().platform().clock.now(); }
-
-// What a double has before its point; an interval beyond a 64-bit integer saturates.
-std::int64_t wholeSeconds(const Value& seconds) { return seconds.integer(); }
 
 }  // namespace
 
@@ -82,31 +76,8 @@ void TWReportingService::reportClientUptime(
     std::int32_t processIdentifier, const std::weak_ptr<TWReportingClientServerInstance>& weakClient) {
   const auto client = weakClient.lock();
   if (client != nullptr) client->handleConnectionError();
-  const auto startDate = client == nullptr ? std::nullopt : client->clientStartDate();
-  const auto processName = client == nullptr ? std::nullopt : client->clientProcessName();
-  const std::string shownName = processName.value_or(std::string(kUnknown));
-
-  Value seconds(-1);
-  if (startDate) {
-    const double today = now();
-    seconds = std::fabs(today - *startDate);
-    if (*startDate > today) {
-      errorLog(category(), "clientStartDate is in the past. clientpid=%d clientprocessname=%@",
-               processIdentifier, shownName);
-    }
-  } else {
-    errorLog(category(), "clientStartDate is nil. clientpid=%d clientprocessname=%@", processIdentifier,
-             shownName);
-  }
-  infoLog(category(), "invalidationHandler: connection exited process=%@ uptime_sec=%d", processName,
-          wholeSeconds(seconds));
-  if (!processName) {
-    errorLog(category(), "clientProcessName is nil. clientpid=%d", processIdentifier);
-    return;
-  }
-  TWReportingContext::current().platform().metricon.sendEvent(kClientUptimeEvent, [&] {
-    return ValueMap{{"processName", *processName}, {"seconds", seconds}};
-  });
+  sendClientUptime(processIdentifier, client == nullptr ? std::nullopt : client->clientStartDate(),
+                   client == nullptr ? std::nullopt : client->clientProcessName());
 }
 
 TWReportingService::Session TWReportingService::findReportingSessionForID(ReporterID reporterID) {

@@ -1,0 +1,292 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "service/TWReportingService.h"
+
+#include <gtest/gtest.h>
+
+#include "service/TWReportingClientServerInstance.h"
+#include "support/ServiceTest.h"
+
+namespace tonewerk {
+namespace {
+
+using ::testing::Contains;
+using ::testing::ElementsAre;
+using ::testing::HasSubstr;
+using ::testing::IsEmpty;
+using ::testing::Not;
+using ::testing::SizeIs;
+using ::testing::StartsWith;
+
+const std::optional<std::vector<ReporterID>> kNoIDs;
+
+class TWReportingServiceTest : public ServiceTest {
+ protected:
+  std::vector<ReporterID> foundFor(const std::optional<std::vector<ReporterID>>& identifiers) {
+    std::vector<ReporterID> found;
+    for (const auto& session : service->findReportingSessionsForIDs(identifiers))
+      found.push_back(session->reporterID());
+    return found;
+  }
+};
+
+// Clients come and go.
+
+TEST_F(TWReportingServiceTest, ListsClientsInOrderOfConnectionWithTheirNamesAndStartDates) {
+  test.processes.setName(11, "player");
+  const auto first = connect(11);
+  const auto second = connect(12);
+  run();
+  ASSERT_THAT(service->getAllClients(), SizeIs(2));
+  EXPECT_EQ(service->getAllClients()[0]->processIdentifier(), 11);
+  EXPECT_EQ(service->getAllClients()[0]->clientProcessName(), "player");
+  EXPECT_EQ(service->getAllClients()[0]->clientStartDate(), test.clock.now());
+  EXPECT_EQ(service->getAllClients()[1]->processIdentifier(), 12);
+  EXPECT_EQ(service->getAllClients()[1]->clientProcessName(), std::nullopt);
+  EXPECT_THAT(test.log.textsOf("twrs", LogLevel::kInfo), Contains(StartsWith("newConnection: ")));
+  EXPECT_THAT(test.log.textsOf("twrs", LogLevel::kInfo), Contains("new client with pid 11"));
+}
+
+TEST_F(TWReportingServiceTest, AClientThatLeavesIsRemovedOnceAlthoughTwoHandlersSaySo) {
+  auto client = connect(11);
+  run();
+  client->disconnect();
+  run();
+  EXPECT_THAT(service->getAllClients(), IsEmpty());
+  const auto lines = test.log.textsOf("twrs", LogLevel::kInfo);
+  EXPECT_THAT(lines, Contains("interruptionHandler: connection exited"));
+  EXPECT_THAT(lines, Contains("removing 11 from the server client list").Times(1));
+  EXPECT_THAT(lines, Contains("dealloc 11 from the server client list").Times(1));
+}
+
+TEST_F(TWReportingServiceTest, ALostClientsStartedSessionsStopAndReport) {
+  auto client = connect(11);
+  start(*client, 77);
+  const auto started = sessionOf(0, 77);
+  create(*client, 78);
+  const auto unstarted = sessionOf(0, 78);
+  client->disconnect();
+  run();
+  EXPECT_FALSE(started->started());
+  EXPECT_THAT(started->messages(), IsEmpty());
+  EXPECT_THAT(unstarted->messages(), IsEmpty());  // not stopped: no stop message
+  EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kDebug), Contains("ending session. reporterID=77"));
+}
+
+TEST_F(TWReportingServiceTest, ALostClientsStartIsNotAnswered) {
+  auto client = connect(11);
+  create(*client, 77);
+  const auto identifier = client->request("startReportingSessionForID", {77});
+  run();
+  client->disconnect();
+  run();
+  EXPECT_EQ(client->responseTo(identifier), std::nullopt);
+}
+
+TEST_F(TWReportingServiceTest, ReportsHowLongAClientWasConnected) {
+  test.processes.setName(11, "player");
+  auto client = connect(11);
+  run();
+  test.clock.advance(12.75);
+  client->disconnect();
+  const auto events = test.metricon.eventsNamed("com.orvane.tonewerk.twreportingclientuptime");
+  ASSERT_THAT(events, SizeIs(1));
+  EXPECT_EQ(events[0].text(), R"({"processName":"player","seconds":12.75})");
+  EXPECT_THAT(test.log.textsOf("twrs", LogLevel::kInfo),
+              Contains("invalidationHandler: connection exited process=player uptime_sec=12"));
+}
+
+TEST_F(TWReportingServiceTest, AClientThatWasNeverRegisteredHasNoStartDateAndMinusOneSeconds) {
+  auto client = connect(11);
+  client->disconnect();  // before the work queue has got to it
+  EXPECT_THAT(test.log.textsOf("twrs", LogLevel::kError),
+              ElementsAre("clientStartDate is nil. clientpid=11 clientprocessname=unknown",
+                          "clientProcessName is nil. clientpid=11"));
+  EXPECT_THAT(test.log.textsOf("twrs", LogLevel::kInfo),
+              Contains("invalidationHandler: connection exited process=(null) uptime_sec=-1"));
+  EXPECT_THAT(test.metricon.events(), IsEmpty());
+  run();
+  EXPECT_THAT(service->getAllClients(), IsEmpty());
+}
+
+TEST_F(TWReportingServiceTest, AStartDateInTheFutureIsLoggedAndTheIntervalCounts) {
+  test.processes.setName(11, "player");
+  auto client = connect(11);
+  run();
+  test.clock.setNow(test.clock.now() - 100);
+  client->disconnect();
+  EXPECT_THAT(test.log.textsOf("twrs", LogLevel::kError),
+              ElementsAre("clientStartDate is in the past. clientpid=11 clientprocessname=player"));
+  EXPECT_EQ(test.metricon.eventsNamed("com.orvane.tonewerk.twreportingclientuptime").at(0).number("seconds"),
+            100.0);
+}
+
+TEST_F(TWReportingServiceTest, SaysWhenItGoes) {
+  service.reset();
+  EXPECT_THAT(test.log.textsOf("twrc", LogLevel::kInfo), ElementsAre("destroying service"));
+}
+
+// Finding one session.
+
+TEST_F(TWReportingServiceTest, FindsASessionOfAnyClient) {
+  const auto first = connect(11);
+  const auto second = connect(12);
+  create(*second, 78);
+  EXPECT_EQ(service->findReportingSessionForID(78), sessionOf(1, 78));
+  EXPECT_THAT(test.log.textsOf("twrs", LogLevel::kInfo),
+              Contains("found reporting session 78 for client 12"));
+}
+
+TEST_F(TWReportingServiceTest, OfTwoClientsWithOneIdentifierTheFirstConnectedWins) {
+  const auto first = connect(11);
+  const auto second = connect(12);
+  create(*second, 77);
+  create(*first, 77);
+  EXPECT_EQ(service->findReportingSessionForID(77), sessionOf(0, 77));
+}
+
+TEST_F(TWReportingServiceTest, AnUnknownIdentifierIsAnError) {
+  EXPECT_EQ(service->findReportingSessionForID(5), nullptr);
+  EXPECT_THAT(test.log.textsOf("twrs", LogLevel::kError), ElementsAre("failed to find reporting session 5"));
+}
+
+TEST_F(TWReportingServiceTest, IdentifierZeroAndDisabledReportingFindNothingAndSayNothing) {
+  const auto client = connect(11);
+  create(*client, 0);
+  create(*client, 77);
+  test.log.clear();
+  EXPECT_EQ(service->findReportingSessionForID(0), nullptr);
+  service->setReportingEnabled(false);
+  EXPECT_EQ(service->findReportingSessionForID(77), nullptr);
+  EXPECT_THAT(test.log.lines(), IsEmpty());
+}
+
+// Finding a message's sessions.
+
+TEST_F(TWReportingServiceTest, AMessageWithIdentifiersGoesToTheKnownOnesInOrder) {
+  const auto client = connect(11);
+  create(*client, 77);
+  create(*client, 78);
+  EXPECT_THAT(foundFor({{78, 0, 5, 77}}), ElementsAre(78, 77));
+}
+
+TEST_F(TWReportingServiceTest, AMessageToZeroGoesNowhereNotEvenToTheSingleMessageSession) {
+  EXPECT_THAT(foundFor({{0}}), IsEmpty());
+  EXPECT_THAT(foundFor({{5}}), IsEmpty());
+  EXPECT_THAT(test.log.textsOf("twrs"), Not(Contains("Creating singleMessageSession")));
+}
+
+TEST_F(TWReportingServiceTest, AMessageWithoutIdentifiersGoesToEveryStartedSessionOfEveryClient) {
+  const auto first = connect(11);
+  const auto second = connect(12);
+  start(*first, 78);
+  start(*first, 77);
+  create(*first, 79);
+  start(*second, 5);
+  EXPECT_THAT(foundFor(kNoIDs), ElementsAre(77, 78, 5));
+  EXPECT_THAT(foundFor({{}}), ElementsAre(77, 78, 5));
+  EXPECT_THAT(test.log.textsOf("twrs"), Not(Contains("Creating singleMessageSession")));
+}
+
+TEST_F(TWReportingServiceTest, ListsTheActiveSessionsInTheLog) {
+  const auto client = connect(11);
+  start(*client, 77);
+  test.log.clear();
+  foundFor(kNoIDs);
+  const auto lines = test.log.textsOf("twrs", LogLevel::kDebug);
+  EXPECT_THAT(
+      lines, Contains(StartsWith("sessions for client 11 : (reporterID=77,serviceName=unknown,ownerPid=11")));
+  EXPECT_THAT(lines, Contains(StartsWith("1 active reporting session(s) (reporterID=77,")));
+}
+
+// The single-message session.
+
+TEST_F(TWReportingServiceTest, WithNoStartedSessionAMessageWithoutIdentifiersMakesTheSingleMessageSession) {
+  const auto client = connect(11);
+  create(*client, 77);
+  const auto sessions = service->findReportingSessionsForIDs(kNoIDs);
+  ASSERT_THAT(sessions, SizeIs(1));
+  const auto& single = *sessions[0];
+  EXPECT_EQ(single.reporterID(), 1);
+  EXPECT_TRUE(single.isSingleMessageSession());
+  EXPECT_TRUE(single.started());
+  EXPECT_EQ(single.serviceName(), "standalone");
+  EXPECT_EQ(single.configuration(), (ValueMap{{"HostApplicationDisplayID", "Unknown"}}));
+  EXPECT_THAT(single.processIdentifiers(), ElementsAre(test.processes.ownProcessIdentifier()));
+  EXPECT_THAT(test.log.textsOf("twrs", LogLevel::kInfo), Contains("Creating singleMessageSession"));
+  EXPECT_THAT(service->getAllActiveReportingSessions(), IsEmpty());  // it belongs to no client
+}
+
+TEST_F(TWReportingServiceTest, AClientsOwnIdentifierOneIsAnotherSession) {
+  const auto client = connect(11);
+  create(*client, 1);
+  const auto single = service->findReportingSessionsForIDs(kNoIDs).at(0);
+  EXPECT_NE(single, sessionOf(0, 1));
+  EXPECT_EQ(service->findReportingSessionForID(1), sessionOf(0, 1));
+}
+
+TEST_F(TWReportingServiceTest, AStartedSessionOfAnyClientMakesTheSingleMessageSessionUnneeded) {
+  const auto client = connect(11);
+  start(*client, 77);
+  EXPECT_THAT(foundFor(kNoIDs), ElementsAre(77));
+  EXPECT_THAT(test.log.textsOf("twrs"), Not(Contains("Creating singleMessageSession")));
+}
+
+TEST_F(TWReportingServiceTest, MessagesKeepTheSingleMessageSessionAliveUntilFiveSecondsAfterTheLast) {
+  const auto first = service->findReportingSessionsForIDs(kNoIDs).at(0);
+  test.clock.advance(4.0);
+  EXPECT_EQ(service->findReportingSessionsForIDs(kNoIDs).at(0), first);
+  test.clock.advance(5.0);
+  run();
+  EXPECT_TRUE(first->started());
+  test.clock.advance(0.5);
+  run();
+  EXPECT_FALSE(first->started());
+  EXPECT_THAT(test.log.textsOf("twrs", LogLevel::kInfo),
+              Contains("Stopping singleMessageSession after timeout=5.000000"));
+  EXPECT_NE(service->findReportingSessionsForIDs(kNoIDs).at(0), first);
+}
+
+TEST_F(TWReportingServiceTest, TheReaperSaysWhyItWaits) {
+  foundFor(kNoIDs);
+  test.clock.advance(0.5);
+  EXPECT_THAT(test.log.textsOf("twrs", LogLevel::kDebug),
+              Contains("Not stopping singleMessageSession. elapsed=0.500000 timeout=5.000000"));
+}
+
+TEST_F(TWReportingServiceTest, TheReaperHasTheWorkQueueStopTheSession) {
+  const auto single = service->findReportingSessionsForIDs(kNoIDs).at(0);
+  test.clock.advance(6.0);
+  EXPECT_TRUE(single->started());  // taken out, not yet stopped
+  run();
+  EXPECT_FALSE(single->started());
+}
+
+TEST_F(TWReportingServiceTest, TheReapersTimerEndsWithTheSessionAndANewOneComesWithTheNext) {
+  foundFor(kNoIDs);
+  test.clock.advance(6.0);
+  run();
+  test.log.clear();
+  test.clock.advance(10.0);
+  EXPECT_THAT(test.log.textsOf("twrs"), IsEmpty());
+  const auto next = service->findReportingSessionsForIDs(kNoIDs).at(0);
+  test.clock.advance(6.0);
+  run();
+  EXPECT_FALSE(next->started());
+}
+
+TEST_F(TWReportingServiceTest, ATickWithoutASessionDoesNothing) {
+  service->_reapSingleMessageSession();
+  run();
+  EXPECT_THAT(test.log.textsOf("twrs"), IsEmpty());
+}
+
+TEST_F(TWReportingServiceTest, AtItsEndTheDaemonStopsTheSingleMessageSession) {
+  const auto single = service->findReportingSessionsForIDs(kNoIDs).at(0);
+  service->stopSingleMessageSession();
+  EXPECT_FALSE(single->started());
+  service->stopSingleMessageSession();
+  EXPECT_THAT(foundFor(kNoIDs), ElementsAre(1));
+}
+
+}  // namespace
+}  // namespace tonewerk
