@@ -18,7 +18,6 @@ namespace tonewerk {
 namespace {
 
 using testing::ElementsAre;
-using testing::IsEmpty;
 using testing::SizeIs;
 
 class MemorySide {

@@ -1,0 +1,24 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstdlib>
+#include <string>
+#include <string_view>
+
+namespace tonewerk {
+
+// The bytes that two hexadecimal digits each name: fromHex("94 00") is two bytes.
+inline std::string fromHex(std::string_view digits) {
+  std::string bytes;
+  std::string pair;
+  for (const char digit : digits) {
+    if (digit == ' ') continue;
+    pair += digit;
+    if (pair.size() < 2) continue;
+    bytes += static_cast<char>(std::strtol(pair.c_str(), nullptr, 16));
+    pair.clear();
+  }
+  return bytes;
+}
+
+}  // namespace tonewerk

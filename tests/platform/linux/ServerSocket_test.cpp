@@ -1,0 +1,146 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/ServerSocket.h"
+
+#include <cstdlib>
+#include <fcntl.h>
+#include <filesystem>
+#include <fstream>
+#include <gmock/gmock.h>
+#include <string>
+#include <sys/socket.h>
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include "platform/linux/RawClient.h"
+#include "platform/linux/UnixAddress.h"
+#include "support/TemporaryDirectory.h"
+
+namespace tonewerk {
+namespace {
+
+using testing::HasSubstr;
+
+class ServerSocketTest : public testing::Test {
+ protected:
+  std::unique_ptr<ServerSocket> open() { return ServerSocket::open(path, problem); }
+
+  // What a daemon that was killed leaves: a socket's file on which nobody listens.
+  void leaveStaleSocket() const {
+    const FileDescriptor dead(::socket(AF_UNIX, SOCK_STREAM, 0));
+    const auto address = unixAddressOf(path);
+    ASSERT_EQ(::bind(dead.get(), generic(*address), sizeof(*address)), 0);
+    ASSERT_EQ(::listen(dead.get(), 1), 0);
+  }
+
+  TemporaryDirectory directory;
+  const std::string path = directory.path("reporting.sock");
+  std::string problem;
+};
+
+TEST_F(ServerSocketTest, ListensForItsGroupAndNobodyElse) {
+  const auto socket = open();
+  ASSERT_NE(socket, nullptr) << problem;
+  EXPECT_EQ(socket->name(), path);
+  struct stat made {};
+  ASSERT_EQ(::stat(path.c_str(), &made), 0);
+  EXPECT_EQ(made.st_mode & 0777U, 0660U);
+  EXPECT_TRUE(RawClient(path).isConnected());
+}
+
+TEST_F(ServerSocketTest, HasItsModeWhateverTheMask) {
+  const mode_t before = ::umask(0777);
+  const auto socket = open();
+  ::umask(before);
+  ASSERT_NE(socket, nullptr) << problem;
+  struct stat made {};
+  ASSERT_EQ(::stat(path.c_str(), &made), 0);
+  EXPECT_EQ(made.st_mode & 0777U, 0660U);
+}
+
+TEST_F(ServerSocketTest, MakesTheDirectoriesAboveIt) {
+  const std::string deep = directory.path("run/tonewerk/reporting.sock");
+  const auto socket = ServerSocket::open(deep, problem);
+  ASSERT_NE(socket, nullptr) << problem;
+  EXPECT_TRUE(RawClient(deep).isConnected());
+}
+
+TEST_F(ServerSocketTest, RemovesItsFileAtTheEnd) {
+  ASSERT_NE(open(), nullptr);
+  EXPECT_FALSE(std::filesystem::exists(path));
+}
+
+TEST_F(ServerSocketTest, LeavesAFileThatIsNotItsOwn) {
+  auto socket = open();
+  ASSERT_NE(socket, nullptr);
+  std::filesystem::rename(path, directory.path("moved"));
+  leaveStaleSocket();
+  socket = nullptr;
+  EXPECT_TRUE(std::filesystem::exists(path));
+}
+
+TEST_F(ServerSocketTest, ReplacesWhatADeadDaemonLeft) {
+  leaveStaleSocket();
+  ASSERT_TRUE(std::filesystem::exists(path));
+  const auto socket = open();
+  ASSERT_NE(socket, nullptr) << problem;
+  EXPECT_TRUE(RawClient(path).isConnected());
+}
+
+TEST_F(ServerSocketTest, RefusesASocketInUseAndNamesItsProcess) {
+  const auto first = open();
+  ASSERT_NE(first, nullptr);
+  EXPECT_EQ(open(), nullptr);
+  std::ifstream comm("/proc/self/comm");
+  std::string name;
+  std::getline(comm, name);
+  EXPECT_EQ(problem, path + " is in use by " + name + " (" + std::to_string(::getpid()) + ")");
+  EXPECT_TRUE(RawClient(path).isConnected());
+}
+
+TEST_F(ServerSocketTest, LeavesAFileThatIsNoSocketAlone) {
+  std::ofstream(path) << "precious";
+  EXPECT_EQ(open(), nullptr);
+  EXPECT_EQ(problem, path + " is there and no socket");
+  EXPECT_TRUE(std::filesystem::exists(path));
+}
+
+TEST_F(ServerSocketTest, SaysWhyItCannotListen) {
+  EXPECT_EQ(ServerSocket::open(directory.path(std::string(200, 'x')), problem), nullptr);
+  EXPECT_THAT(problem, HasSubstr("a socket's path cannot be"));
+  std::ofstream(directory.path("file")) << "no directory";
+  EXPECT_EQ(ServerSocket::open(directory.path("file/reporting.sock"), problem), nullptr);
+  EXPECT_THAT(problem, HasSubstr("cannot make"));
+}
+
+// Runs in a child, whose descriptors are then systemd's to arrange: 0 when all was as it should be.
+int takesThePassedSocket(int listening, const std::string& path, const std::string& ownPath) {
+  if (::dup2(listening, 3) != 3) return 10;
+  ::setenv("LISTEN_PID", std::to_string(::getpid()).c_str(), 1);
+  ::setenv("LISTEN_FDS", "1", 1);
+  std::string problem;
+  auto socket = ServerSocket::open(ownPath, problem);
+  if (socket == nullptr || socket->fileDescriptor() != 3) return 11;
+  if (std::filesystem::exists(ownPath)) return 12;
+  if ((::fcntl(3, F_GETFL) & O_NONBLOCK) == 0 || (::fcntl(3, F_GETFD) & FD_CLOEXEC) == 0) return 13;
+  if (!RawClient(path).isConnected()) return 14;
+  if (std::getenv("LISTEN_FDS") != nullptr) return 15;
+  socket = nullptr;
+  return std::filesystem::exists(path) ? 0 : 16;
+}
+
+TEST_F(ServerSocketTest, TakesTheSocketThatSystemdPassedAndLeavesItsFile) {
+  const FileDescriptor listening(::socket(AF_UNIX, SOCK_STREAM, 0));
+  const auto address = unixAddressOf(path);
+  ASSERT_EQ(::bind(listening.get(), generic(*address), sizeof(*address)), 0);
+  ASSERT_EQ(::listen(listening.get(), 5), 0);
+  const pid_t child = ::fork();
+  if (child == 0) ::_exit(takesThePassedSocket(listening.get(), path, directory.path("own.sock")));
+  int status = 0;
+  ASSERT_EQ(::waitpid(child, &status, 0), child);
+  ASSERT_TRUE(WIFEXITED(status));
+  EXPECT_EQ(WEXITSTATUS(status), 0);
+}
+
+}  // namespace
+}  // namespace tonewerk
