@@ -1,0 +1,163 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// twreportingd: puts the daemon together and runs it until a signal or the kill request ends it.
+
+#include <chrono>
+#include <csignal>
+#include <iostream>
+#include <memory>
+#include <pthread.h>
+#include <string>
+#include <string_view>
+#include <sys/resource.h>
+#include <unistd.h>
+
+#include "platform/LogCategory.h"
+#include "platform/LogLine.h"
+#include "platform/Platform.h"
+#include "platform/linux/Directories.h"
+#include "platform/linux/LinuxPlatform.h"
+#include "platform/linux/ReportStore.h"
+#include "platform/linux/ServerSocket.h"
+#include "platform/linux/StoreMetricon.h"
+#include "platform/linux/UnixSocketListener.h"
+#include "service/TWReportingService.h"
+#include "session/TWReportingContext.h"
+#include "session/TWReportingUtility.h"
+#include "workers/TWReportingWorkerClasses.h"
+
+namespace tonewerk {
+namespace {
+
+constexpr int kSuccess = 0;
+constexpr int kFailure = 1;
+constexpr int kUsage = 2;
+constexpr int kKilled = 2;
+
+// How long the end waits for a disk that does not answer.
+constexpr std::chrono::seconds kFlushTimeout{10};
+
+constexpr std::string_view kHelp =
+    "Usage: twreportingd [--help | --version]\n"
+    "\n"
+    "The reporting daemon: takes what audio processes report on a Unix socket and turns it into reports.\n"
+    "It ends in order on SIGTERM and SIGINT, at once on a second one.\n"
+    "\n"
+    "Variables: RUNTIME_DIRECTORY, STATE_DIRECTORY, LOGS_DIRECTORY and CONFIGURATION_DIRECTORY say where "
+    "things\n"
+    "are, TONEWERK_LOG what is logged (debug, info, default, error, or a list such as twrr=debug,default).\n";
+
+// The daemon's parts, in the order in which they need one another.
+class Daemon {
+ public:
+  Daemon(const Directories& directories, std::unique_ptr<ServerSocket> socket, LinuxPlatform& linux,
+         const LogCategory& log)
+      : store_(directories.state, linux.json(), linux.preferences(), linux.clock(), log),
+        metricon_(store_, linux.preferences(), linux.clock(), log),
+        context_(platformOf(linux, directories), allWorkerClasses()),
+        service_(TWReportingService::make([this] { endOnKillRequest(); })),
+        listener_(std::move(socket), log) {
+    listener_.setDelegate(*service_);
+    listener_.resume();
+  }
+
+  // Every client is treated as lost, so that its started sessions stop and report.
+  void endInOrder() {
+    listener_.shutDown();
+    SerialQueue& queue = context_.reportingServerQueue();
+    queue.async([this] { service_->stopSingleMessageSession(); });
+    queue.drain();
+    flushSinks();
+  }
+
+ private:
+  Platform platformOf(LinuxPlatform& linux, const Directories& directories) {
+    Platform platform = linux.platform(metricon_);
+    platform.logsDirectory = directories.logs;
+    return platform;
+  }
+
+  // No session stops; what the sinks already have is written.
+  [[noreturn]] void endOnKillRequest() {
+    flushSinks();
+    ::_exit(kKilled);
+  }
+
+  void flushSinks() {
+    context_.fileSinkQueue().drain();
+    store_.flush(kFlushTimeout);  // a failure is in the store's own log lines
+  }
+
+  ReportStore store_;
+  StoreMetricon metricon_;
+  TWReportingContext context_;
+  std::shared_ptr<TWReportingService> service_;
+  UnixSocketListener listener_;
+};
+
+// Signals that end the daemon; blocked in every thread, so that main() alone takes them.
+sigset_t endSignals() {
+  sigset_t signals;
+  sigemptyset(&signals);
+  sigaddset(&signals, SIGTERM);
+  sigaddset(&signals, SIGINT);
+  return signals;
+}
+
+void waitForEndSignal(const sigset_t& signals) {
+  int signal = 0;
+  while (sigwait(&signals, &signal) != 0) {
+  }
+  // A second one finds its default action and ends the process at once.
+  std::signal(SIGTERM, SIG_DFL);
+  std::signal(SIGINT, SIG_DFL);
+  pthread_sigmask(SIG_UNBLOCK, &signals, nullptr);
+}
+
+// Each client takes a descriptor; the usual soft limit is far below what the system allows.
+void raiseDescriptorLimit() {
+  rlimit limit{};
+  if (getrlimit(RLIMIT_NOFILE, &limit) != 0) return;
+  limit.rlim_cur = limit.rlim_max;
+  static_cast<void>(setrlimit(RLIMIT_NOFILE, &limit));  // the old limit does, too
+}
+
+int run() {
+  const sigset_t signals = endSignals();
+  pthread_sigmask(SIG_BLOCK, &signals, nullptr);
+  std::signal(SIGPIPE, SIG_IGN);
+  raiseDescriptorLimit();
+
+  const Directories directories = Directories::fromEnvironment();
+  LinuxPlatform linux(directories);
+  const LogCategory log(linux.log(), "com.orvane.tonewerk", "twrs");
+  std::string problem;
+  auto socket = ServerSocket::open(directories.runtime + "/reporting.sock", problem);
+  if (socket == nullptr) {
+    errorLog(log, "cannot listen: %@", problem);
+    return kFailure;
+  }
+  defaultLog(log, "listening on %@, state in %@", socket->name(), directories.state);
+  Daemon daemon(directories, std::move(socket), linux, log);
+  waitForEndSignal(signals);
+  daemon.endInOrder();
+  return kSuccess;
+}
+
+}  // namespace
+}  // namespace tonewerk
+
+int main(int argc, char** argv) {
+  if (argc == 1) return tonewerk::run();
+  const std::string_view option = argv[1];
+  if (argc == 2 && option == "--help") {
+    std::cout << tonewerk::kHelp;
+    return tonewerk::kSuccess;
+  }
+  if (argc == 2 && option == "--version") {
+    std::cout << "twreportingd " << TONEWERK_VERSION << "\n";
+    return tonewerk::kSuccess;
+  }
+  std::cerr << "twreportingd: it takes no arguments but --help and --version\n";
+  return tonewerk::kUsage;
+}
