@@ -1,0 +1,77 @@
+// SPDX-License-Identifier: Apache-2.0
+// tw-pipewire: reports the output streams of a PipeWire graph to the reporting daemon.
+#include <CLI/CLI.hpp>
+#include <csignal>
+#include <cstdio>
+#include <pipewire/pipewire.h>
+#include <unistd.h>
+
+#include "bridges/pipewire/DaemonLink.h"
+#include "bridges/pipewire/PipeWireGraph.h"
+#include "bridges/pipewire/StreamReports.h"
+#include "platform/linux/SystemClock.h"
+
+namespace tonewerk {
+namespace {
+
+constexpr int kWrongUsage = 2;
+
+// How long the daemon has, at the end, to take the last messages.
+constexpr std::chrono::milliseconds kLastWords{3000};
+
+int runBridge(const Diagnostics& diagnostics) {
+  const std::unique_ptr<PipeWireLoop> loop = PipeWireLoop::make();
+  if (loop == nullptr) {
+    diagnostics.say("cannot make an event loop");
+    return 1;
+  }
+  const auto quit = [&loop] { loop->quit(); };
+  const auto terminate = loop->watchSignal(SIGTERM, quit);
+  const auto interrupt = loop->watchSignal(SIGINT, quit);
+
+  const SystemClock clock;
+  ReporterIdentifiers identifiers(clock, getpid());
+  DaemonLink daemon(*loop, diagnostics, ReportingClient::socketPaths());
+  StreamReports reports(daemon, clock, identifiers, *loop);
+  GraphModel model(reports);
+  {
+    PipeWireGraph graph(*loop, model, diagnostics);
+    daemon.open([&reports] { reports.restartAll(); });
+    if (!graph.open()) {
+      diagnostics.say("cannot use PipeWire: its client configuration is missing or broken");
+      return 1;
+    }
+    loop->run();
+  }
+  // Streams that still play are no longer watched: their sessions end here.
+  model.clear();
+  if (daemon.isConnected() && !daemon.finish(kLastWords)) diagnostics.say("the daemon took not everything");
+  return 0;
+}
+
+}  // namespace
+}  // namespace tonewerk
+
+int main(int argc, char** argv) {
+  CLI::App app(
+      "Reports what plays in a PipeWire graph: each output stream as a session of the reporting daemon.\n"
+      "Waits for both daemons, and follows them when they restart. Ends on SIGTERM or SIGINT.");
+  app.footer(
+      "Environment:\n"
+      "  TONEWERK_REPORTING_SOCKET  the reporting daemon's socket\n"
+      "  PIPEWIRE_REMOTE            which PipeWire");
+  app.set_version_flag("--version", "tw-pipewire " TONEWERK_VERSION);
+  bool verbose = false;
+  app.add_flag("-v,--verbose", verbose, "Say what is reported, on standard error");
+  try {
+    app.parse(argc, argv);
+  } catch (const CLI::ParseError& error) {
+    // --help and --version come here too, with 0.
+    return app.exit(error) == 0 ? 0 : tonewerk::kWrongUsage;
+  }
+
+  pw_init(nullptr, nullptr);
+  const int status = tonewerk::runBridge(tonewerk::Diagnostics(verbose));
+  pw_deinit();
+  return status;
+}
