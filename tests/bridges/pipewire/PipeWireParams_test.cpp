@@ -62,6 +62,23 @@ TEST(PipeWireParams, ReadsAPlainFormat) {
   EXPECT_EQ(formatOf(maker.close()), (AudioFormat{"lpcm", "S16LE", 44'100, 6}));
 }
 
+// PipeWire hands out the formats of some streams so; they were once taken for streams without a rate.
+TEST(PipeWireParams, ReadsAFormatWhoseValuesAreChoicesOfOne) {
+  FormatMaker maker(SPA_MEDIA_TYPE_audio, SPA_MEDIA_SUBTYPE_raw);
+  const auto asChoice = [&](std::uint32_t key, auto add) {
+    spa_pod_builder* builder = maker.property(key);
+    spa_pod_frame choice{};
+    spa_pod_builder_push_choice(builder, &choice, SPA_CHOICE_None, 0);
+    add(builder);
+    spa_pod_builder_pop(builder, &choice);
+  };
+  asChoice(SPA_FORMAT_AUDIO_format,
+           [](spa_pod_builder* b) { spa_pod_builder_id(b, SPA_AUDIO_FORMAT_S16_LE); });
+  asChoice(SPA_FORMAT_AUDIO_rate, [](spa_pod_builder* b) { spa_pod_builder_int(b, 48'000); });
+  asChoice(SPA_FORMAT_AUDIO_channels, [](spa_pod_builder* b) { spa_pod_builder_int(b, 2); });
+  EXPECT_EQ(formatOf(maker.close()), (AudioFormat{"lpcm", "S16LE", 48'000, 2}));
+}
+
 TEST(PipeWireParams, ReadsAPackedFormat) {
   FormatMaker maker(SPA_MEDIA_TYPE_audio, SPA_MEDIA_SUBTYPE_iec958);
   maker.rate(48'000);
