@@ -1,0 +1,65 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "system/support/DaemonProcess.h"
+
+#include <filesystem>
+#include <fstream>
+#include <gtest/gtest.h>
+#include <signal.h>
+#include <sys/socket.h>
+
+#include "platform/linux/FileDescriptor.h"
+#include "platform/linux/UnixAddress.h"
+
+namespace tonewerk {
+
+DaemonProcess::DaemonProcess() {
+  for (const char* directory : {kRuntime, kState, kLogs, kConfiguration}) {
+    std::filesystem::create_directories(path(directory));
+  }
+  environment_ = {{"RUNTIME_DIRECTORY", path(kRuntime)},
+                  {"STATE_DIRECTORY", path(kState)},
+                  {"LOGS_DIRECTORY", path(kLogs)},
+                  {"CONFIGURATION_DIRECTORY", path(kConfiguration)},
+                  {"TONEWERK_LOG", "debug"}};
+}
+
+std::string DaemonProcess::path(const char* directory, const std::string& name) const {
+  const std::string base = directory_.path(directory);
+  return name.empty() ? base : base + "/" + name;
+}
+
+std::map<std::string, std::string> DaemonProcess::clientEnvironment() const {
+  return {{"TONEWERK_REPORTING_SOCKET", socketPath()}};
+}
+
+bool DaemonProcess::writeConfiguration(const std::string& name, const std::string& text) const {
+  const std::filesystem::path file = path(kConfiguration, name);
+  std::filesystem::create_directories(file.parent_path());
+  return static_cast<bool>(std::ofstream(file) << text << std::flush);
+}
+
+bool DaemonProcess::start() {
+  const ChildCommand command{TONEWERK_DAEMON_PATH, {}, environment_};
+  if (!process_.start(command, directory_.path("output"), directory_.path("log"))) return false;
+  waitUntil([this] { return accepts() || !process_.isRunning(); });
+  if (accepts()) return true;
+  ADD_FAILURE() << "the daemon accepts no connections; its log:\n" << log();
+  return false;
+}
+
+std::optional<int> DaemonProcess::stop() {
+  process_.signal(SIGTERM);
+  const std::optional<int> status = process_.wait();
+  if (!status) ADD_FAILURE() << "the daemon does not end; its log:\n" << log();
+  return status;
+}
+
+bool DaemonProcess::accepts() const {
+  const FileDescriptor socket(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
+  const auto address = unixAddressOf(socketPath());
+  return address && connect(socket.get(), generic(*address), sizeof(*address)) == 0;
+}
+
+std::string DaemonProcess::log() const { return textOfFile(directory_.path("log")); }
+
+}  // namespace tonewerk
