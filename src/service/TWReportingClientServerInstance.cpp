@@ -146,6 +146,11 @@ void TWReportingClientServerInstance::startReportingSessionForID(ReporterID repo
 void TWReportingClientServerInstance::sendMessage(ValueMap message, AudioEventCategory messageCategory,
                                                   AudioEventType type, ReporterIDs reporterIDs,
                                                   ServiceRequest request) {
+  if (reporterIDs && reporterIDs->size() > kMostSessions) {
+    return request.reply(
+        messagingError(kOverLimit, "the message names " + std::to_string(reporterIDs->size()) +
+                                       " sessions, the most is " + std::to_string(kMostSessions)));
+  }
   if (!reporterIDs || reporterIDs->empty()) {
     const Delegate delegate = delegate_.lock();
     if (delegate != nullptr && delegate->isReportingEnabled() && TWReportingUtilityIsInternalBuild()) {

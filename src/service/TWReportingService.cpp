@@ -157,23 +157,19 @@ TWReportingService::Session TWReportingService::makeSingleMessageSession() {
 }
 
 void TWReportingService::_reapSingleMessageSession() {
-  Session session = takeOutSingleMessageSession();
-  if (session == nullptr) return;
-  TWReportingUtilityGetReportingServerQueue().async([session = std::move(session)] { session->stop(); });
-}
-
-TWReportingService::Session TWReportingService::takeOutSingleMessageSession() {
   const std::lock_guard lock(singleMessageMutex_);
-  if (singleMessageSession_ == nullptr || !singleMessageSessionLastRetrieved_) return nullptr;
+  if (singleMessageSession_ == nullptr || !singleMessageSessionLastRetrieved_) return;
   const double elapsed = now() - *singleMessageSessionLastRetrieved_;
   if (!(kSingleMessageSessionTimeoutSeconds < elapsed)) {
     debugLog(category(), "Not stopping singleMessageSession. elapsed=%f timeout=%f", elapsed,
              kSingleMessageSessionTimeoutSeconds);
-    return nullptr;
+    return;
   }
   infoLog(category(), "Stopping singleMessageSession after timeout=%f", kSingleMessageSessionTimeoutSeconds);
   singleMessageSessionReaper_.reset();
-  return std::exchange(singleMessageSession_, nullptr);
+  // Queued under the lock, so that whoever finds the session gone also finds its stop on the queue.
+  TWReportingUtilityGetReportingServerQueue().async(
+      [session = std::exchange(singleMessageSession_, nullptr)] { session->stop(); });
 }
 
 void TWReportingService::stopSingleMessageSession() {

@@ -59,7 +59,6 @@ class TWReportingService final : public MessagingListenerDelegate,
   void reportClientUptime(std::int32_t processIdentifier,
                           const std::weak_ptr<TWReportingClientServerInstance>& client);
   Session singleMessageSession();
-  Session takeOutSingleMessageSession();
   static Session makeSingleMessageSession();
 
   const std::function<void()> endProcess_;

@@ -326,6 +326,19 @@ TEST_F(RequestTest, AMessageReachesSessionsOfOtherClients) {
   EXPECT_THAT(sessionOf(1, 78)->messages(), SizeIs(1));
 }
 
+TEST_F(RequestTest, AMessageNamesAsManySessionsAsAConnectionHoldsAndNotOneMore) {
+  create(*client, 77);
+  const auto named = [](std::size_t count) {
+    return Value(ValueArray(std::vector<Value>(count, Value(77))));
+  };
+  const auto taken = ask(*client, "sendMessage", {ValueMap{{"a", 1}}, 4, 1, named(4096)});
+  EXPECT_EQ(taken.at(0).error, std::nullopt);
+  EXPECT_EQ(sessionOf(0, 77)->totalMessageCount(), 4096U);
+  const auto refused = ask(*client, "sendMessage", {ValueMap{{"a", 2}}, 4, 1, named(4097)});
+  EXPECT_EQ(refused.at(0).error->code, 3);
+  EXPECT_EQ(sessionOf(0, 77)->totalMessageCount(), 4096U);
+}
+
 TEST_F(RequestTest, AMessageIsAnsweredWithNil) {
   const auto answers = ask(*client, "sendMessage", {ValueMap{{"a", 1}}, 4, 1, std::nullopt});
   ASSERT_THAT(answers, SizeIs(1));
