@@ -43,12 +43,13 @@ std::vector<std::string> environmentFor(const std::map<std::string, std::string>
     for (const std::string_view foreign : kForeignVariables) isForeign = isForeign || name == foreign;
     if (!isForeign) result.emplace_back(text);
   }
-  for (const auto& [name, value] : changes) result.push_back(name + "=" + value);
+  for (const auto& [name, value] : changes) result.emplace_back(name).append("=").append(value);
   return result;
 }
 
 std::vector<char*> pointersTo(std::vector<std::string>& texts) {
   std::vector<char*> pointers;
+  pointers.reserve(texts.size() + 1);
   for (std::string& text : texts) pointers.push_back(text.data());
   pointers.push_back(nullptr);
   return pointers;
