@@ -41,7 +41,11 @@ ReportStore::~ReportStore() {
 }
 
 void ReportStore::recordEvent(double recordedAt, const SharedString& name, ValueMap payload) {
-  const bool hangs = queue_.add(AnalyticsRow{recordedAt, {name, SharedString()}, std::move(payload)});
+  record(AnalyticsRow{recordedAt, {name, SharedString()}, std::move(payload)});
+}
+
+void ReportStore::record(StoreRow row) {
+  const bool hangs = queue_.add(std::move(row));
   if (hangs) errorLog(log_, "writing to %s hangs; what does not fit is dropped", database_.path());
 }
 

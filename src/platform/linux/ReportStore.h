@@ -50,6 +50,8 @@ class ReportStore {
   // Any thread. `recordedAt` in seconds since 1970. Two events with one payload storage recorded one right
   // after the other share a row.
   void recordEvent(double recordedAt, const SharedString& name, ValueMap payload);
+  // Any thread. A row of any table.
+  void record(StoreRow row);
 
   // Any thread but the work of JsonService, preferences and log. Returns when everything recorded before is
   // in the file; false when it cannot be written or `timeout` passed.

@@ -31,6 +31,11 @@ void SqliteStatement::bind(int parameter, std::string_view text) {
   sqlite3_bind_text64(statement_, parameter, data, text.size(), SQLITE_STATIC, SQLITE_UTF8);
 }
 
+void SqliteStatement::bindBytes(int parameter, std::string_view bytes) {
+  const char* data = bytes.data() == nullptr ? "" : bytes.data();
+  sqlite3_bind_blob64(statement_, parameter, data, bytes.size(), SQLITE_STATIC);
+}
+
 void SqliteStatement::bindNull(int parameter) { sqlite3_bind_null(statement_, parameter); }
 
 SqliteStatement::Step SqliteStatement::step() {
@@ -60,6 +65,13 @@ std::string SqliteStatement::text(int column) const {
   const unsigned char* text = sqlite3_column_text(statement_, column);
   if (text == nullptr) return {};
   return {reinterpret_cast<const char*>(text),
+          static_cast<std::size_t>(sqlite3_column_bytes(statement_, column))};
+}
+
+std::string SqliteStatement::bytes(int column) const {
+  const void* bytes = sqlite3_column_blob(statement_, column);
+  if (bytes == nullptr) return {};
+  return {static_cast<const char*>(bytes),
           static_cast<std::size_t>(sqlite3_column_bytes(statement_, column))};
 }
 

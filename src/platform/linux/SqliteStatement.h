@@ -29,6 +29,8 @@ class SqliteStatement {
   void bind(int parameter, std::int64_t number);
   void bind(int parameter, double number);
   void bind(int parameter, std::string_view text);
+  // Likewise not copied.
+  void bindBytes(int parameter, std::string_view bytes);
   void bindNull(int parameter);
 
   Step step();
@@ -41,6 +43,7 @@ class SqliteStatement {
   std::int64_t integer(int column) const;
   double number(int column) const;
   std::string text(int column) const;
+  std::string bytes(int column) const;
   bool isNull(int column) const;
 
  private:

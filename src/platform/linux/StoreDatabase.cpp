@@ -26,12 +26,15 @@ StoreDatabase::Result StoreDatabase::write(std::span<const StoreRow> rows) {
   if (opened != Result::kDone || rows.empty()) return opened;
   if (!database_.run("BEGIN IMMEDIATE")) return fail();
   for (const StoreRow& row : rows) {
-    const bool inserted =
-        std::visit([this](const AnalyticsRow& held) { return analytics_->insert(held); }, row);
+    const bool inserted = std::visit([this](const auto& held) { return insert(held); }, row);
     if (!inserted) return fail();
   }
   return database_.run("COMMIT") ? Result::kDone : fail();
 }
+
+bool StoreDatabase::insert(const AnalyticsRow& row) { return analytics_->insert(row); }
+
+bool StoreDatabase::insert(const MetricRow& row) { return metrics_->insert(row); }
 
 void StoreDatabase::setBounds(const StoreBounds& bounds) {
   bounds_ = bounds;
@@ -80,6 +83,7 @@ StoreDatabase::Result StoreDatabase::open() {
   if (!database_.run("PRAGMA journal_mode = WAL; PRAGMA synchronous = NORMAL")) return fail();
   applyBounds();
   analytics_.emplace(database_, json_);
+  metrics_.emplace(database_);
   trimmer_.emplace(database_);
   return Result::kDone;
 }
@@ -122,6 +126,7 @@ StoreDatabase::Result StoreDatabase::failWith(std::string problem) {
 void StoreDatabase::close() {
   // Statements before their database. An open transaction is undone.
   analytics_.reset();
+  metrics_.reset();
   trimmer_.reset();
   database_.close();
 }

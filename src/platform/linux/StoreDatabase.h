@@ -6,6 +6,7 @@
 #include <string>
 
 #include "platform/linux/AnalyticsTable.h"
+#include "platform/linux/MetricTable.h"
 #include "platform/linux/SqliteDatabase.h"
 #include "platform/linux/StoreRow.h"
 #include "platform/linux/StoreTrimmer.h"
@@ -47,6 +48,8 @@ class StoreDatabase {
  private:
   Result open();
   bool prepareFile();
+  bool insert(const AnalyticsRow& row);
+  bool insert(const MetricRow& row);
   void applyBounds();
   Result resultOf(StoreTrimmer::Outcome outcome, bool& moreToDo);
   Result fail();
@@ -58,6 +61,7 @@ class StoreDatabase {
   const JsonService& json_;
   SqliteDatabase database_;
   std::optional<AnalyticsTable> analytics_;  // while it is open
+  std::optional<MetricTable> metrics_;       // likewise
   std::optional<StoreTrimmer> trimmer_;      // likewise
   StoreBounds bounds_;
   std::string problem_;

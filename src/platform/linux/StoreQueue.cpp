@@ -12,13 +12,10 @@ constexpr double kTogetherSeconds = 0.001;
 
 }  // namespace
 
-bool StoreQueue::add(AnalyticsRow row) {
+bool StoreQueue::add(StoreRow row) {
   std::unique_lock lock(mutex_);
-  if (joins(row)) {
-    std::get<AnalyticsRow>(queued_.back()).names[1] = std::move(row.names[0]);
-    return false;
-  }
-  const std::size_t bytes = row.bytes();
+  if (joinLast(row)) return false;
+  const std::size_t bytes = bytesOf(row);
   bool heldUp = false;
   if (!fits(bytes) && holds_) {
     heldUp = !room_.wait_for(lock, limits_.hold, [&] { return fits(bytes) || !holds_; });
@@ -107,11 +104,14 @@ std::uint64_t StoreQueue::lost() const {
   return queued_.size() + takenRows_ + dropped_;
 }
 
-bool StoreQueue::joins(const AnalyticsRow& row) const {
-  if (queued_.empty() || row.names[0].empty()) return false;
-  const auto* last = std::get_if<AnalyticsRow>(&queued_.back());
-  return last != nullptr && last->names[1].empty() && last->payload.sharesStorageWith(row.payload) &&
-         std::abs(row.recordedAt - last->recordedAt) < kTogetherSeconds;
+bool StoreQueue::joinLast(const StoreRow& row) {
+  const auto* event = std::get_if<AnalyticsRow>(&row);
+  auto* last = queued_.empty() ? nullptr : std::get_if<AnalyticsRow>(&queued_.back());
+  const bool joins = event != nullptr && last != nullptr && !event->names[0].empty() &&
+                     last->names[1].empty() && last->payload.sharesStorageWith(event->payload) &&
+                     std::abs(event->recordedAt - last->recordedAt) < kTogetherSeconds;
+  if (joins) last->names[1] = event->names[0];
+  return joins;
 }
 
 bool StoreQueue::fits(std::size_t bytes) const {

@@ -38,7 +38,7 @@ class StoreQueue {
 
   // Any thread. An analytics row with one name joins the one before it when both are the same payload,
   // recorded together. Returns true when this row begins a time of dropping because of the hold time.
-  bool add(AnalyticsRow row);
+  bool add(StoreRow row);
 
   // Any thread. Waits until everything added before is committed; false when the first try to write that
   // began after the call fails, or after `timeout`.
@@ -67,7 +67,7 @@ class StoreQueue {
   std::uint64_t lost() const;
 
  private:
-  bool joins(const AnalyticsRow& row) const;
+  bool joinLast(const StoreRow& row);
   bool fits(std::size_t bytes) const;
   bool isUrgent() const;
 

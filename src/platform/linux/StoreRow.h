@@ -3,6 +3,8 @@
 
 #include <array>
 #include <cstddef>
+#include <cstdint>
+#include <string>
 #include <variant>
 
 #include "values/Value.h"
@@ -21,8 +23,17 @@ struct AnalyticsRow {
   std::size_t bytes() const { return sizeof(AnalyticsRow) + payload.bytes(); }
 };
 
+// A posted metric record.
+struct MetricRow {
+  double postedAt = 0.0;  // seconds since 1970
+  std::uint32_t identifier = 0;
+  std::string record;  // bytes
+
+  std::size_t bytes() const { return sizeof(MetricRow) + record.size(); }
+};
+
 // What the store writes as one row of one of its tables.
-using StoreRow = std::variant<AnalyticsRow>;
+using StoreRow = std::variant<AnalyticsRow, MetricRow>;
 
 inline std::size_t bytesOf(const StoreRow& row) {
   return std::visit([](const auto& held) { return held.bytes(); }, row);

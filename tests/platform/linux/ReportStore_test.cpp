@@ -154,6 +154,23 @@ TEST_F(ReportStoreTest, KeepsTheTimesOfEqualPayloadsRecordedApart) {
   EXPECT_EQ(found[1].recordedAt, ManualClock::kStart + 2.0);
 }
 
+TEST_F(ReportStoreTest, KeepsMetricRecordsByteForByteBetweenEvents) {
+  open();
+  record("com.orvane.a", {{"n", 1}});
+  store_->record(MetricRow{clock_.now(), 0x5B0003, std::string("\x10\x00\x1a", 3)});
+  record("com.orvane.b", {{"n", 2}});
+  ASSERT_TRUE(flush());
+  SqliteDatabase database;
+  ASSERT_TRUE(database.open(file(), SqliteDatabase::Mode::kReadOnly, kLongEnough));
+  SqliteStatement select = database.prepare("SELECT posted_at, identifier, record FROM metric");
+  ASSERT_EQ(select.step(), SqliteStatement::Step::kRow);
+  EXPECT_EQ(select.number(0), clock_.now());
+  EXPECT_EQ(select.integer(1), 0x5B0003);
+  EXPECT_EQ(select.bytes(2), std::string("\x10\x00\x1a", 3));
+  EXPECT_EQ(select.step(), SqliteStatement::Step::kDone);
+  EXPECT_THAT(events(), SizeIs(2));
+}
+
 TEST_F(ReportStoreTest, UsesKnownNamesAgainAfterARestart) {
   for (int run = 0; run < 2; ++run) {
     open();
