@@ -41,10 +41,12 @@ struct ValueMap::Rep {
 
   Entry* find(const SharedString& key) {
     if (!slots.empty()) return probe(key.view(), key.hash());
+    const std::size_t hash = key.hash();
     for (Entry& entry : entries) {
-      if (entry.key.sharesStorageWith(key)) return &entry;
+      // Keys of one client often differ only in their last characters; hashes differ at once.
+      if (entry.key.hash() == hash && entry.key == key) return &entry;
     }
-    return find(key.view());
+    return nullptr;
   }
 
   Entry* probe(std::string_view key, std::size_t hash) {
