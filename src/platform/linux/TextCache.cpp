@@ -7,11 +7,16 @@ namespace tonewerk {
 
 std::optional<SharedString> TextCache::find(std::string_view text) {
   if (text.size() > mostBytes_) return isUtf8(text) ? std::optional<SharedString>(text) : std::nullopt;
-  SharedString& slot = slots_[SharedString::hashOf(text) & (slots_.size() - 1)];
-  if (slot == text) return slot;
+  std::size_t& guess = slots_[last_].next;
+  last_ = guess;
+  if (slots_[guess].text == text) return slots_[guess].text;
+  guess = SharedString::hashOf(text) & (slots_.size() - 1);
+  last_ = guess;
+  SharedString& kept = slots_[guess].text;
+  if (kept == text) return kept;
   if (!isUtf8(text)) return std::nullopt;
-  slot = SharedString(text);
-  return slot;
+  kept = SharedString(text);
+  return kept;
 }
 
 }  // namespace tonewerk

@@ -24,8 +24,14 @@ class TextCache {
   std::optional<SharedString> find(std::string_view text);
 
  private:
-  std::vector<SharedString> slots_;
+  struct Slot {
+    SharedString text;
+    std::size_t next = 0;
+  };
+
+  std::vector<Slot> slots_;
   std::size_t mostBytes_;
+  std::size_t last_ = 0;  // the place of the text that was asked for last
 };
 
 }  // namespace tonewerk

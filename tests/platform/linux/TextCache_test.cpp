@@ -30,6 +30,13 @@ TEST(TextCacheTest, StillFindsTheRightTextWhenPlacesAreFought) {
   EXPECT_EQ(*cache.find(""), "");
 }
 
+TEST(TextCacheTest, FindsTheRightTextsInEveryOrder) {
+  TextCache cache(64, 8);
+  for (const char* text : {"a", "b", "c", "a", "b", "c", "c", "b", "a", "", "a", "c", "", ""}) {
+    EXPECT_EQ(*cache.find(text), text);
+  }
+}
+
 TEST(TextCacheTest, RefusesWhatIsNotUtf8WhateverItsLength) {
   TextCache cache(16, 8);
   EXPECT_FALSE(cache.find("\xFF"));
