@@ -1,0 +1,54 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstdint>
+#include <functional>
+#include <optional>
+#include <string>
+
+#include "platform/linux/SqliteDatabase.h"
+
+namespace tonewerk {
+
+// One analytics event as the report store holds it.
+struct StoredEvent {
+  std::int64_t id = 0;
+  double recordedAt = 0.0;  // seconds since 1970
+  std::string name;
+  std::string payload;  // JSON
+};
+
+struct EventFilter {
+  std::optional<std::string> name;  // a pattern with *, ? and [...]
+  std::optional<double> since;      // seconds since 1970, inclusive
+  std::optional<double> until;      // likewise
+  std::int64_t afterId = 0;
+  std::optional<std::int64_t> limit;  // the newest so many
+};
+
+// Reads a report store, with a daemon writing to it or without. One thread.
+class StoreReader {
+ public:
+  enum class Outcome { kDone, kNoStore, kFailed };
+
+  // The store in `directory`. kNoStore when there is none, or none with anything in it yet.
+  Outcome open(const std::string& directory);
+
+  // Every event that passes, oldest first. False on failure.
+  bool readEvents(const EventFilter& filter, const std::function<void(const StoredEvent& event)>& take);
+
+  // Whether another file has taken the place of the one opened.
+  bool hasMoved() const { return database_.hasMoved(); }
+  // What the last failure was, with the file's path.
+  const std::string& problem() const { return problem_; }
+
+ private:
+  Outcome openAs(SqliteDatabase::Mode mode);
+  Outcome fail(const std::string& problem);
+
+  std::string path_;
+  SqliteDatabase database_;
+  std::string problem_;
+};
+
+}  // namespace tonewerk
