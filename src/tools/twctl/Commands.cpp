@@ -1,0 +1,45 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "tools/twctl/Commands.h"
+
+#include <CLI/CLI.hpp>
+#include <exception>
+
+namespace tonewerk {
+
+CLI::App& addCommand(CLI::App& app, Tool& tool, const std::string& name, const std::string& description) {
+  CLI::App& command = *app.add_subcommand(name, description);
+  addCommonOptions(command, tool);
+  return command;
+}
+
+void addCommonOptions(CLI::App& app, Tool& tool) {
+  app.add_flag("--json", tool.asJson, "One JSON object a line instead of a table");
+  app.add_flag("--system", tool.systemWide, "The system's daemon and directories, whoever asks");
+}
+
+int runCommandLine(int argc, const char* const* argv, Tool& tool) {
+  CLI::App app("Talks to the reporting daemon, and reads what it has stored.", "twctl");
+  app.set_version_flag("--version", std::string("twctl ") + TONEWERK_VERSION);
+  app.footer(
+      "Exit status: 0 done; 1 refused, not valid or not there; 2 wrong usage, a bad recording included;\n"
+      "3 no daemon answers.");
+  app.require_subcommand(1);
+  addCommonOptions(app, tool);
+  addListCommand(app, tool);
+  addValidateCommand(app, tool);
+  addSendCommand(app, tool);
+  addReplayCommand(app, tool);
+  addEventsCommand(app, tool);
+  addDefaultsCommand(app, tool);
+  addKillCommand(app, tool);
+  try {
+    app.parse(argc, argv);
+  } catch (const CLI::ParseError& error) {
+    return app.exit(error, tool.out, tool.err) == 0 ? kDone : kWrongUsage;
+  } catch (const std::exception& error) {
+    return tool.fail(kRefused, error.what());
+  }
+  return tool.status;
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,31 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <string>
+
+#include "tools/twctl/Tool.h"
+
+namespace CLI {
+class App;
+}
+
+namespace tonewerk {
+
+// The tool's commands, one file each. Adding one to `app` declares its arguments; when the command line names
+// it, it runs and leaves its exit status in `tool`, which outlives `app`.
+void addListCommand(CLI::App& app, Tool& tool);
+void addValidateCommand(CLI::App& app, Tool& tool);
+void addSendCommand(CLI::App& app, Tool& tool);
+void addReplayCommand(CLI::App& app, Tool& tool);
+void addEventsCommand(CLI::App& app, Tool& tool);
+void addDefaultsCommand(CLI::App& app, Tool& tool);
+void addKillCommand(CLI::App& app, Tool& tool);
+
+// A command with the options that all have.
+CLI::App& addCommand(CLI::App& app, Tool& tool, const std::string& name, const std::string& description);
+void addCommonOptions(CLI::App& app, Tool& tool);
+
+// Reads the command line and runs what it asks for. The exit status.
+int runCommandLine(int argc, const char* const* argv, Tool& tool);
+
+}  // namespace tonewerk

@@ -1,0 +1,34 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <optional>
+#include <string_view>
+
+#include "client/ReportingClient.h"
+#include "tools/twctl/Tool.h"
+
+namespace tonewerk {
+
+// A command's connection to the daemon. What goes wrong is printed and becomes the tool's exit status.
+class Daemon {
+ public:
+  // `tool` outlives it.
+  explicit Daemon(Tool& tool) : tool_(tool) {}
+
+  // False when no daemon listens.
+  bool connect();
+
+  // The answer's result (none for nil) in `result`. False when the request was refused or not answered.
+  bool call(std::string_view method, const Arguments& arguments, std::optional<Value>& result);
+
+  ReportingClient& client() { return client_; }
+
+  // "method: message (domain, code 2)".
+  static std::string describe(std::string_view method, const ReplyError& error);
+
+ private:
+  Tool& tool_;
+  ReportingClient client_;
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,41 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <iosfwd>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "platform/linux/Directories.h"
+
+namespace tonewerk {
+
+class JsonService;
+
+// How twctl ends.
+enum ExitStatus : int {
+  kDone = 0,
+  kRefused = 1,     // refused, not valid, or not there
+  kWrongUsage = 2,  // a bad recording included
+  kNoDaemon = 3,    // nobody answers
+};
+
+// What every command works with: where to print, and what the common options say.
+struct Tool {
+  std::ostream& out;
+  std::ostream& err;
+  const JsonService& json;
+  bool asJson = false;      // --json
+  bool systemWide = false;  // --system
+  int status = kDone;       // of the command that ran
+
+  // Prints "twctl: <problem>" and returns `failure`.
+  int fail(ExitStatus failure, std::string_view problem) const;
+
+  // Of the caller, or of the system's daemon.
+  Directories directories() const;
+  // Where to look for the daemon, in this order.
+  std::vector<std::string> socketPaths() const;
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,13 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "tools/twctl/ToolLog.h"
+
+namespace tonewerk {
+
+void ToolLog::write(std::string_view /*subsystem*/, std::string_view /*category*/, LogLevel /*level*/,
+                    std::string_view message) {
+  // The prefix of source file and line says nothing to people.
+  const std::size_t prefix = logPrefix("", 0).size();
+  tool_.fail(kRefused, message.size() > prefix ? message.substr(prefix) : message);
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,330 @@
+// SPDX-License-Identifier: Apache-2.0
+#include <filesystem>
+#include <fstream>
+#include <gmock/gmock.h>
+#include <memory>
+#include <sstream>
+#include <stdlib.h>
+#include <string>
+#include <vector>
+
+#include "platform/linux/NlohmannJsonService.h"
+#include "platform/linux/ReportStore.h"
+#include "support/ManualClock.h"
+#include "support/MemoryLog.h"
+#include "support/MemoryPreferenceStore.h"
+#include "support/TemporaryDirectory.h"
+#include "tools/ScriptedDaemon.h"
+#include "tools/twctl/Commands.h"
+
+namespace tonewerk {
+namespace {
+
+using testing::HasSubstr;
+using testing::IsEmpty;
+using testing::SizeIs;
+using testing::StartsWith;
+
+// twctl with directories and a socket of its own.
+class CommandLineTest : public testing::Test {
+ protected:
+  CommandLineTest() {
+    setenv("TONEWERK_REPORTING_SOCKET", socket_.c_str(), 1);
+    setenv("STATE_DIRECTORY", directory_.path("state").c_str(), 1);
+    setenv("CONFIGURATION_DIRECTORY", directory_.path("configuration").c_str(), 1);
+  }
+  void TearDown() override {
+    for (const char* name : {"TONEWERK_REPORTING_SOCKET", "STATE_DIRECTORY", "CONFIGURATION_DIRECTORY"})
+      unsetenv(name);
+  }
+
+  // The exit status; what was printed is in output() and errors().
+  int run(const std::vector<std::string>& arguments) {
+    std::vector<const char*> argv{"twctl"};
+    for (const std::string& argument : arguments) argv.push_back(argument.c_str());
+    out_.str({});
+    err_.str({});
+    Tool tool{out_, err_, json_};
+    return runCommandLine(static_cast<int>(argv.size()), argv.data(), tool);
+  }
+  std::string output() const { return out_.str(); }
+  std::string errors() const { return err_.str(); }
+
+  ScriptedDaemon& daemon() {
+    if (daemon_ == nullptr) daemon_ = std::make_unique<ScriptedDaemon>(socket_);
+    return *daemon_;
+  }
+  std::string write(const std::string& name, const std::string& text) {
+    std::ofstream(directory_.path(name)) << text;
+    return directory_.path(name);
+  }
+
+  TemporaryDirectory directory_;
+  const std::string socket_ = directory_.path("reporting.sock");
+  NlohmannJsonService json_;
+  std::ostringstream out_;
+  std::ostringstream err_;
+  std::unique_ptr<ScriptedDaemon> daemon_;
+};
+
+TEST_F(CommandLineTest, HelpsWithEveryCommand) {
+  for (const char* name : {"list", "validate", "send", "replay", "events", "defaults", "kill"}) {
+    EXPECT_EQ(run({name, "--help"}), kDone);
+    EXPECT_THAT(output(), HasSubstr("--json")) << name;
+    EXPECT_THAT(errors(), IsEmpty());
+  }
+}
+
+TEST_F(CommandLineTest, SaysItsVersion) {
+  EXPECT_EQ(run({"--version"}), kDone);
+  EXPECT_THAT(output(), StartsWith("twctl "));
+}
+
+TEST_F(CommandLineTest, CallsWrongUsageWrong) {
+  for (const std::vector<std::string>& wrong : std::vector<std::vector<std::string>>{
+           {},
+           {"frob"},
+           {"list", "more"},
+           {"validate"},
+           {"validate", "seven"},
+           {"send", "--type", "Start", "a=1"},
+           {"send", "--category", "Playback", "--type", "Start"},
+           {"send", "--category", "Nonsense", "--type", "Start", "a=1"},
+           {"send", "--category", "Playback", "--type", "Nonsense", "a=1"},
+           {"send", "--category", "Playback", "--type", "Start", "a"},
+           {"send", "--category", "Playback", "--type", "Start", "--payload", "[]"},
+           {"send", "--category", "Playback", "--type", "Start", "--payload", "{}", "a=1"},
+           {"send", "--category", "Playback", "--type", "Start", "--id", "x", "a=1"},
+           {"replay", "/nowhere.jsonl"},
+           {"replay", "/"},
+           {"events", "--since", "then"},
+           {"events", "--limit", "0"},
+           {"defaults"},
+           {"defaults", "write", "a.b", "c"}}) {
+    EXPECT_EQ(run(wrong), kWrongUsage) << testing::PrintToString(wrong);
+    EXPECT_THAT(errors(), testing::Not(IsEmpty()));
+  }
+}
+
+TEST_F(CommandLineTest, SaysWhereNoDaemonListens) {
+  for (const std::vector<std::string>& command : std::vector<std::vector<std::string>>{
+           {"list"}, {"validate", "7"}, {"kill"}, {"send", "--category", "4", "--type", "1", "a=1"}}) {
+    EXPECT_EQ(run(command), kNoDaemon);
+    EXPECT_THAT(errors(), HasSubstr("no daemon listens on " + socket_));
+  }
+}
+
+TEST_F(CommandLineTest, ListsSessions) {
+  daemon().answer("getAllReporters", ValueArray{7});
+  daemon().answer("reporterIDValid", ValueMap{{"reporterID", 7}, {"serviceType", 2}});
+  EXPECT_EQ(run({"list"}), kDone);
+  EXPECT_EQ(output(), "reporterID  serviceType  serviceName\n7           2            telephony\n");
+  EXPECT_EQ(run({"list", "--json"}), kDone);
+  EXPECT_EQ(output(), "{\"reporterID\":7,\"serviceType\":2,\"serviceName\":\"telephony\"}\n");
+  EXPECT_EQ(run({"--json", "list"}), kDone);
+  EXPECT_THAT(output(), StartsWith("{"));
+}
+
+TEST_F(CommandLineTest, ListsNothingWhenThereIsNoSession) {
+  daemon().answer("getAllReporters", ValueArray());
+  EXPECT_EQ(run({"list", "--json"}), kDone);
+  EXPECT_THAT(output(), IsEmpty());
+}
+
+TEST_F(CommandLineTest, ValidatesAnIdentifier) {
+  daemon().answer("reporterIDValid", ValueMap{{"reporterID", -7}, {"serviceType", 65535}});
+  EXPECT_EQ(run({"validate", "-7", "--json"}), kDone);
+  EXPECT_EQ(output(), "{\"reporterID\":-7,\"serviceType\":65535,\"serviceName\":\"unknown\"}\n");
+}
+
+TEST_F(CommandLineTest, RefusesAnIdentifierThatNobodyHas) {
+  daemon().answer("reporterIDValid", ValueMap{{"reporterID", 0}, {"serviceType", 65535}});
+  EXPECT_EQ(run({"validate", "7"}), kRefused);
+  EXPECT_THAT(errors(), HasSubstr("no session has the identifier 7"));
+  EXPECT_EQ(run({"validate", "0"}), kRefused);
+}
+
+TEST_F(CommandLineTest, SendsAMessageToTheSessionsNamed) {
+  daemon();
+  EXPECT_EQ(run({"send", "--id", "7", "--id", "-8", "--category", "HAL_Playback", "--type", "Start",
+                 "on=true", "n=5", "volume=0.5", "text=a=b"}),
+            kDone);
+  ASSERT_THAT(daemon().requests(), SizeIs(1));
+  const Arguments arguments = daemon().requests()[0].arguments;
+  EXPECT_EQ(arguments[0], Value(ValueMap{{"on", true}, {"n", 5}, {"volume", 0.5}, {"text", "a=b"}}));
+  EXPECT_EQ(arguments[1], Value(0x20000004));
+  EXPECT_EQ(arguments[2], Value(1));
+  EXPECT_EQ(arguments[3], Value(ValueArray{7, -8}));
+}
+
+TEST_F(CommandLineTest, SendsAPayloadToAllWithoutANamedSession) {
+  daemon();
+  EXPECT_EQ(run({"send", "--category", "14", "--type", "65535", "--payload", R"({"a": [1, {"b": "c"}]})"}),
+            kDone);
+  const Arguments arguments = daemon().requests().at(0).arguments;
+  EXPECT_EQ(arguments[0], Value(ValueMap{{"a", ValueArray{1, ValueMap{{"b", "c"}}}}}));
+  EXPECT_EQ(arguments[2], Value(65535));
+  EXPECT_FALSE(arguments[3]);
+}
+
+TEST_F(CommandLineTest, SaysWhyAMessageWasRefused) {
+  daemon().refuse("sendMessage", ReplyError{"com.orvane.audio.reporting", 1, ""});
+  EXPECT_EQ(run({"send", "--category", "4", "--type", "1", "a=1"}), kRefused);
+  EXPECT_THAT(errors(), HasSubstr("reporting is disabled (com.orvane.audio.reporting, code 1)"));
+}
+
+TEST_F(CommandLineTest, RefusesAMessageThatNoFrameCarries) {
+  daemon();
+  EXPECT_EQ(run({"send", "--category", "4", "--type", "1", "a=" + std::string(2 << 20, 'x')}), kRefused);
+  EXPECT_THAT(daemon().requests(), IsEmpty());
+}
+
+TEST_F(CommandLineTest, KillsTheDaemon) {
+  daemon();
+  EXPECT_EQ(run({"kill"}), kDone);
+  EXPECT_THAT(daemon().requests(), SizeIs(1));
+}
+
+TEST_F(CommandLineTest, SaysWhyTheDaemonWasNotKilled) {
+  daemon().refuse("killService", ReplyError{"com.orvane.audio.reporting", 1, ""});
+  EXPECT_EQ(run({"kill"}), kRefused);
+}
+
+TEST_F(CommandLineTest, PlaysARecordingWithoutWaitingForAStart) {
+  daemon();
+  const std::string file =
+      write("recording.jsonl", R"({"at": 0, "call": "createReportingSession", "params": [7]}
+{"at": 0.01, "call": "startReportingSessionForID", "params": [7]}
+{"at": 0.02, "call": "sendMessage", "params": [{"time": {"now": 0}}, 4, 1, null]}
+)");
+  EXPECT_EQ(run({"replay", file, "--json"}), kDone);
+  EXPECT_EQ(output(), "{\"requests\":3,\"refused\":0}\n");
+  const auto requests = daemon().requests();
+  ASSERT_THAT(requests, SizeIs(3));
+  EXPECT_EQ(requests[1].method, "startReportingSessionForID");
+  const Value* time = requests[2].arguments[0]->asMap()->find("time");
+  EXPECT_GT(numberOf(time), 1.7e9);
+}
+
+TEST_F(CommandLineTest, PlaysWithoutPauses) {
+  daemon();
+  std::string text;
+  for (int n = 0; n < 3000; ++n) {
+    text += "{\"at\": " + std::to_string(n * 1000) + ", \"call\": \"createReportingSession\", \"params\": [" +
+            std::to_string(n) + "]}\n";
+  }
+  EXPECT_EQ(run({"replay", write("recording.jsonl", text), "--speed", "max"}), kDone);
+  EXPECT_THAT(daemon().requests(), SizeIs(3000));
+}
+
+TEST_F(CommandLineTest, NamesTheLinesOfARecordingThatWereRefused) {
+  daemon().refuse("sendMessage", ReplyError{"com.orvane.tonewerk.messaging", 3, "too much"});
+  const std::string file =
+      write("recording.jsonl", R"({"at": 0, "call": "createReportingSession", "params": [7]}
+
+{"at": 0, "call": "sendMessage", "params": [{}, 4, 1, [7]]}
+{"at": 0, "call": "destroyReportingSession", "params": [7]}
+)");
+  EXPECT_EQ(run({"replay", file}), kRefused);
+  EXPECT_THAT(errors(), HasSubstr("line 3: sendMessage: too much"));
+  EXPECT_THAT(daemon().requests(), SizeIs(3));
+}
+
+TEST_F(CommandLineTest, PlaysNothingOfABadRecording) {
+  daemon();
+  const std::string file =
+      write("recording.jsonl", R"({"at": 0, "call": "createReportingSession", "params": [7]}
+{"at": 0, "call": "createReportingSession", "params": ["x"]}
+)");
+  EXPECT_EQ(run({"replay", file}), kWrongUsage);
+  EXPECT_THAT(errors(), HasSubstr("line 2: createReportingSession: argument 1"));
+  EXPECT_EQ(run({"replay", file, "--speed", "0"}), kWrongUsage);
+  EXPECT_EQ(run({"replay", file, "--speed", "fast"}), kWrongUsage);
+  EXPECT_THAT(daemon().requests(), IsEmpty());
+}
+
+TEST_F(CommandLineTest, PlaysARecordingThatEndsTheDaemon) {
+  daemon();
+  EXPECT_EQ(
+      run({"replay", write("recording.jsonl", "{\"at\": 0, \"call\": \"killService\", \"params\": []}\n")}),
+      kDone);
+}
+
+TEST_F(CommandLineTest, PlaysTheExamples) {
+  daemon();
+  for (const char* name : {"music-session.jsonl", "no-session.jsonl"}) {
+    const std::string file = std::string(TONEWERK_SOURCE_DIR) + "/examples/" + name;
+    EXPECT_EQ(run({"replay", file, "--speed", "max"}), kDone) << errors();
+  }
+}
+
+// With a store that holds three events.
+class EventsCommandTest : public CommandLineTest {
+ protected:
+  void store() {
+    MemoryLog log;
+    const LogCategory category(log, "com.orvane.tonewerk", "twrs");
+    const MemoryPreferenceStore preferences;
+    ManualClock clock;
+    ReportStore store(directory_.path("state"), json_, preferences, clock, category);
+    store.recordEvent(1'763'633'880.0, "com.orvane.a", {{"n", 1}});
+    store.recordEvent(1'763'633'890.5, "com.orvane.b", {{"n", 2}});
+    store.recordEvent(1'763'633'900.0, "com.orvane.a", {{"n", 3}});
+  }
+};
+
+TEST_F(EventsCommandTest, SaysThatThereIsNoStore) {
+  EXPECT_EQ(run({"events"}), kRefused);
+  EXPECT_THAT(errors(), HasSubstr(directory_.path("state/reports.db") + ": there is no such file"));
+}
+
+TEST_F(EventsCommandTest, ShowsEventsToPeople) {
+  store();
+  EXPECT_EQ(run({"events", "--name", "*.b"}), kDone);
+  EXPECT_EQ(output(),
+            "id  time                    name          payload\n"
+            "4   2025-11-20T10:18:10.5Z  com.orvane.b  {\"n\":2}\n");
+}
+
+TEST_F(EventsCommandTest, GivesEventsToPrograms) {
+  store();
+  EXPECT_EQ(run({"events", "--json", "--limit", "2"}), kDone);
+  EXPECT_EQ(output(),
+            "{\"id\":4,\"recorded_at\":1763633890.5,\"name\":\"com.orvane.b\",\"payload\":{\"n\":2}}\n"
+            "{\"id\":6,\"recorded_at\":1763633900.0,\"name\":\"com.orvane.a\",\"payload\":{\"n\":3}}\n");
+}
+
+TEST_F(EventsCommandTest, TakesTimes) {
+  store();
+  EXPECT_EQ(
+      run({"events", "--json", "--since", "2025-11-20T10:18:05Z", "--until", "2025-11-20T11:18:15+01:00"}),
+      kDone);
+  EXPECT_EQ(output(),
+            "{\"id\":4,\"recorded_at\":1763633890.5,\"name\":\"com.orvane.b\",\"payload\":{\"n\":2}}\n");
+}
+
+TEST_F(CommandLineTest, SetsPreferences) {
+  EXPECT_EQ(run({"defaults", "read", "a.b"}), kRefused);
+  EXPECT_EQ(run({"defaults", "write", "a.b", "list", "[1, \"x\"]"}), kDone);
+  EXPECT_EQ(run({"defaults", "write", "a.b", "text", "some words"}), kDone);
+  EXPECT_EQ(run({"defaults", "write", "a.b", "number", "-5"}), kDone);
+  EXPECT_EQ(run({"defaults", "read", "a.b", "list", "--json"}), kDone);
+  EXPECT_EQ(output(), "{\"key\":\"list\",\"value\":[1,\"x\"]}\n");
+  EXPECT_EQ(run({"defaults", "read", "a.b"}), kDone);
+  EXPECT_THAT(output(), HasSubstr("text    some words\n"));
+  EXPECT_THAT(output(), HasSubstr("number  -5\n"));
+  EXPECT_EQ(run({"defaults", "delete", "a.b", "text"}), kDone);
+  EXPECT_EQ(run({"defaults", "read", "a.b", "text"}), kRefused);
+  EXPECT_EQ(run({"defaults", "delete", "a.b", "text"}), kRefused);
+}
+
+TEST_F(CommandLineTest, DoesNotDeleteWhatIsConfigured) {
+  std::filesystem::create_directories(directory_.path("configuration/preferences"));
+  write("configuration/preferences/a.b.toml", "key = 5\n");
+  EXPECT_EQ(run({"defaults", "delete", "a.b", "key"}), kRefused);
+  EXPECT_THAT(errors(), testing::Not(IsEmpty()));
+  EXPECT_EQ(run({"defaults", "read", "a.b", "key"}), kDone);
+}
+
+}  // namespace
+}  // namespace tonewerk
