@@ -60,9 +60,15 @@ bool StoreQueue::take(std::vector<StoreRow>& batch, bool wait) {
     work_.wait(lock, [&] { return !queued_.empty() || stopped_; });
     work_.wait_for(lock, limits_.gather, [&] { return isUrgent(); });
   }
-  batch.swap(queued_);
+  takenBytes_ = 0;
+  while (!queued_.empty() && batch.size() < limits_.batchRows && takenBytes_ < limits_.batchBytes) {
+    takenBytes_ += bytesOf(queued_.front());
+    batch.push_back(std::move(queued_.front()));
+    queued_.pop_front();
+  }
   takenRows_ = batch.size();
-  takenBytes_ = std::exchange(queuedBytes_, 0);
+  queuedBytes_ -= takenBytes_;
+  leftOver_ = !queued_.empty();
   return !batch.empty() || !stopped_;
 }
 
@@ -121,7 +127,7 @@ bool StoreQueue::fits(std::size_t bytes) const {
 }
 
 bool StoreQueue::isUrgent() const {
-  return stopped_ || openFlushes_ > 0 || queued_.size() >= limits_.batchRows ||
+  return stopped_ || leftOver_ || openFlushes_ > 0 || queued_.size() >= limits_.batchRows ||
          queuedBytes_ >= limits_.bytes / 4;
 }
 

@@ -5,6 +5,7 @@
 #include <condition_variable>
 #include <cstddef>
 #include <cstdint>
+#include <deque>
 #include <mutex>
 #include <vector>
 
@@ -30,6 +31,9 @@ class StoreQueue {
     // Rows wait this long for company, or until there are so many or a quarter of the bytes.
     std::chrono::milliseconds gather{80};
     std::size_t batchRows = 1000;
+    // What is taken at once is at most so many rows and about so many bytes, so that the file never outgrows
+    // its bounds by more.
+    std::size_t batchBytes = 512 << 10;
     // The longest that add() waits.
     std::chrono::milliseconds hold{2000};
   };
@@ -78,7 +82,8 @@ class StoreQueue {
   std::condition_variable progress_;  // for flush()
 
   // All guarded by mutex_.
-  std::vector<StoreRow> queued_;
+  std::deque<StoreRow> queued_;
+  bool leftOver_ = false;  // rows that did not fit into the last batch
   std::size_t queuedBytes_ = 0;
   std::size_t takenRows_ = 0;
   std::size_t takenBytes_ = 0;
