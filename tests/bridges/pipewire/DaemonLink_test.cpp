@@ -114,6 +114,35 @@ TEST_F(DaemonLinkTest, TriesUntilADaemonListens) {
   EXPECT_EQ(connections, 1);
 }
 
+TEST_F(DaemonLinkTest, TriesSoonAgainAfterADaemonThatHasServed) {
+  open();
+  clock.advance(60.0);
+  startDaemon();
+  waitForRetry();
+  link.create(77);
+  ASSERT_TRUE(loop.runReadable());
+  ASSERT_TRUE(link.isConnected());
+  daemon.reset();
+  ASSERT_TRUE(loop.runReadable());
+  startDaemon();
+  clock.advance(RetryDelay::kFirst);
+  EXPECT_EQ(connections, 2);
+}
+
+// One that turns everybody away is found by every try, and must not be tried at the pace of one that
+// restarts.
+TEST_F(DaemonLinkTest, TriesSeldomADaemonThatOnlyEverHangsUp) {
+  open();
+  clock.advance(60.0);
+  startDaemon();
+  waitForRetry();
+  daemon.reset();
+  ASSERT_TRUE(loop.runReadable());
+  startDaemon();
+  clock.advance(RetryDelay::kFirst);
+  EXPECT_EQ(connections, 1);
+}
+
 TEST_F(DaemonLinkTest, KeepsNothingForADaemonThatIsAway) {
   open();
   link.create(77);

@@ -183,6 +183,16 @@ TEST_F(StreamReporterTest, TellsNothingOfAChangeThatIsTakenBack) {
   EXPECT_THAT(told(), ElementsAre("0 on 0.5 Speaker"));
 }
 
+TEST_F(StreamReporterTest, HoldsAChangeNoLongerForNewsOfOtherThings) {
+  play();
+  setVolume(0.3);
+  clock.advance(0.15);
+  state.application = "renamed";
+  tell();
+  clock.advance(0.05);
+  EXPECT_THAT(told(), ElementsAre("0 on 0.5 Speaker", "1 on 0.3 Speaker"));
+}
+
 TEST_F(StreamReporterTest, TellsAMoveToAnotherSinkOnceWhateverTheStepsOnTheWay) {
   play();
   for (const char* step : {"", "Headset, Speaker", "Headset"}) setDevice(step);
@@ -277,6 +287,14 @@ TEST_F(StreamReporterTest, GivesAStreamThatLeavesUndescribedItsSessionToo) {
   EXPECT_THAT(told(), ElementsAre("0 on 0.5 Speaker", "0.1 off 0.5 Speaker end 0.1"));
   EXPECT_THAT(sink.only().calls,
               ElementsAre("create", "configure", "start", "message", "message", "stop", "destroy"));
+}
+
+TEST_F(StreamReporterTest, GivesASilentStreamThatLeavesUndescribedItsSessionToo) {
+  state.described = false;
+  tell();
+  leave();
+  ASSERT_THAT(sink.sessions, SizeIs(1));
+  EXPECT_THAT(sink.only().calls, ElementsAre("create", "configure", "start", "message", "stop", "destroy"));
 }
 
 TEST_F(StreamReporterTest, MeasuresTheSessionBySteadyTime) {
