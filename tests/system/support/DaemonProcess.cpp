@@ -60,6 +60,22 @@ bool DaemonProcess::accepts() const {
   return address && connect(socket.get(), generic(*address), sizeof(*address)) == 0;
 }
 
+std::size_t DaemonProcess::residentBytes() const {
+  std::ifstream status("/proc/" + std::to_string(process_.identifier()) + "/status");
+  constexpr std::string_view kField = "VmRSS:";
+  for (std::string line; std::getline(status, line);) {
+    if (line.starts_with(kField)) return std::stoul(line.substr(kField.size())) * 1024;
+  }
+  return 0;
+}
+
+std::size_t DaemonProcess::openDescriptors() const {
+  std::error_code error;
+  const std::filesystem::directory_iterator all("/proc/" + std::to_string(process_.identifier()) + "/fd",
+                                                error);
+  return error ? 0 : static_cast<std::size_t>(std::distance(begin(all), end(all)));
+}
+
 std::string DaemonProcess::log() const { return textOfFile(directory_.path("log")); }
 
 }  // namespace tonewerk

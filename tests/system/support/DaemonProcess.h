@@ -47,6 +47,10 @@ class DaemonProcess {
   ChildProcess& process() { return process_; }
   bool accepts() const;
 
+  // The memory it has in use, and the descriptors it holds; 0 when it does not run.
+  std::size_t residentBytes() const;
+  std::size_t openDescriptors() const;
+
   // Everything it has written to standard error, in all its runs.
   std::string log() const;
 

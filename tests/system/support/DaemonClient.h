@@ -1,0 +1,57 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstdint>
+#include <memory>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "client/ReportingClient.h"
+#include "session/AudioEvent.h"
+#include "values/Value.h"
+
+namespace tonewerk {
+
+// A well-behaved client in a test: whatever goes wrong with its connection is a test failure.
+class DaemonClient {
+ public:
+  explicit DaemonClient(const std::string& socketPath);
+
+  // Waits for the answer. One without error or result when there was none, which is a test failure.
+  Answer call(std::string_view method, const Arguments& arguments = {});
+  // The answer's handler adds the method's name to answered(), and error answers are test failures.
+  void request(std::string_view method, const Arguments& arguments);
+  void notify(std::string_view method, const Arguments& arguments);
+
+  // These wait for their answers, which have to be as expected.
+  void create(ReporterID reporterID);
+  void create(ReporterID reporterID, AudioServiceType serviceType);
+  void setConfiguration(ReporterID reporterID, const ValueMap& configuration);
+  void send(const ValueMap& message, AudioEventCategory category, AudioEventType type,
+            const std::vector<ReporterID>& reporterIDs);
+  void stop(ReporterID reporterID);
+  void destroy(ReporterID reporterID);
+  AudioServiceType serviceType(ReporterID reporterID);
+  std::vector<ReporterID> allReporters();
+
+  // Comes back when the daemon has started the session; the start's answer is still to come.
+  void start(ReporterID reporterID);
+
+  // What request() sent and the daemon answered so far, in the order of the answers.
+  const std::vector<std::string>& answered() const { return *answered_; }
+  bool waitForAnswers(std::size_t count);
+
+  // Whether the daemon has ended the connection.
+  bool waitForEnd();
+  void disconnect() { client_->disconnect(); }
+  ReportingClient& reportingClient() { return *client_; }
+
+ private:
+  void expectTrue(std::string_view method, const Arguments& arguments);
+
+  std::unique_ptr<ReportingClient> client_ = std::make_unique<ReportingClient>();
+  std::shared_ptr<std::vector<std::string>> answered_ = std::make_shared<std::vector<std::string>>();
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,31 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <nlohmann/json.hpp>
+#include <optional>
+#include <string>
+#include <vector>
+
+namespace tonewerk {
+
+// What anybody can read out of the daemon's store, also while the daemon writes.
+class StoreReader {
+ public:
+  explicit StoreReader(std::string path) : path_(std::move(path)) {}
+
+  // The payloads of all events of this name, oldest first; none without a readable store.
+  std::vector<nlohmann::json> events(const std::string& name) const;
+  // The names of all events, oldest first.
+  std::vector<std::string> eventNames() const;
+  // What the database itself finds wrong with it; "ok" when nothing is.
+  std::string integrity() const;
+
+ private:
+  // The first column of all rows.
+  std::vector<std::string> texts(const std::string& query,
+                                 const std::optional<std::string>& argument = {}) const;
+
+  const std::string path_;
+};
+
+}  // namespace tonewerk
