@@ -9,17 +9,21 @@
 namespace tonewerk {
 
 std::string textOf(Date date) {
-  constexpr double kFirst = -62167219200.0;      // 0000-01-01T00:00:00Z
-  constexpr double kLast = 253402300799.999999;  // 9999-12-31T23:59:59.999999Z
-  const double seconds = std::isnan(date.seconds) ? 0.0 : std::clamp(date.seconds, kFirst, kLast);
+  constexpr double kFirst = -62167219200.0;  // 0000-01-01T00:00:00Z
+  constexpr double kEnd =
+      253402300800.0;  // 10000-01-01T00:00:00Z; no double tells its last microsecond apart
+  const double seconds = std::isnan(date.seconds) ? 0.0 : std::clamp(date.seconds, kFirst, kEnd);
 
   // Seconds and microseconds apart: a double of today's date has no digits to spare for a product.
   double whole = std::floor(seconds);
   double micros = std::round((seconds - whole) * 1e6);
   if (micros >= 1e6) {
-    const bool last = whole >= std::floor(kLast);
-    whole += last ? 0.0 : 1.0;
-    micros = last ? 999999.0 : 0.0;
+    whole += 1.0;
+    micros = 0.0;
+  }
+  if (whole >= kEnd) {
+    whole = kEnd - 1.0;
+    micros = 999999.0;
   }
 
   const std::chrono::sys_seconds time{std::chrono::seconds(static_cast<std::int64_t>(whole))};
