@@ -2,9 +2,10 @@
 #include "platform/LogLine.h"
 
 #include <gmock/gmock.h>
-
+#include <optional>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "platform/LogCategory.h"
 #include "support/MemoryLog.h"
@@ -14,13 +15,64 @@ namespace {
 
 using testing::ElementsAre;
 
-// A std::string converts to a string_view and to a Value alike; it used to be printed as a list of its characters.
+// A std::string converts to a string_view and to a Value alike; it used to be printed as a list of its
+// characters.
 TEST(LogLineTest, ShowsEveryKindOfTextAsItIs) {
   MemoryLog log;
   const LogCategory category(log, "com.orvane.tonewerk", "twrs");
   const char* const pointer = "d";
-  errorLog(category, "%s %s %s %s %@", std::string("a"), std::string_view("b"), "c", pointer, SharedString("e"));
+  errorLog(category, "%s %s %s %s %@", std::string("a"), std::string_view("b"), "c", pointer,
+           SharedString("e"));
   EXPECT_THAT(log.textsOf("twrs"), ElementsAre("a b c d e"));
+}
+
+TEST(LogLineTest, PrefixIsTheFilesBaseNameAndLine) {
+  EXPECT_EQ(logPrefix("/a/b/TWReportingSession.cpp", 214), "       TWReportingSession:214   ");
+  EXPECT_EQ(logPrefix("x.h", 1), "                        x:1     ");
+  EXPECT_EQ(logPrefix("ANameOfMoreThanTwentyFiveCharacters.cpp", 123456),
+            "ANameOfMoreThanTwentyFiveCharacters:123456 ");
+}
+
+TEST(LogLineTest, TakesFileAndLineFromTheCall) {
+  MemoryLog log;
+  const LogCategory category(log, "com.orvane.tonewerk", "twrs");
+  infoLog(category, "x");
+  const int line = __LINE__ - 1;
+  EXPECT_EQ(log.lines().at(0).message, logPrefix("LogLine_test.cpp", line) + "x");
+}
+
+TEST(LogLineTest, ShowsNumbersByTheirOwnType) {
+  MemoryLog log;
+  const LogCategory category(log, "com.orvane.tonewerk", "twrs");
+  debugLog(category, "%i %lli %lu %zu %d 100%%", -1, std::int64_t{-9000000000}, 7UL, std::size_t{3}, true);
+  debugLog(category, "%f %@ %f", 0.5, 0.5, 1e20);
+  EXPECT_THAT(log.textsOf("twrs"),
+              ElementsAre("-1 -9000000000 7 3 1 100%", "0.500000 0.5 100000000000000000000.000000"));
+}
+
+TEST(LogLineTest, ShowsValuesListsAndWhatIsAbsent) {
+  MemoryLog log;
+  const LogCategory category(log, "com.orvane.tonewerk", "twrs");
+  const Value value(ValueMap{{"a", 1}});
+  const Value* absent = nullptr;
+  debugLog(category, "%@ %@ %@ %@", value, absent, std::vector<int>{1, 2}, std::optional<int>());
+  EXPECT_THAT(log.textsOf("twrs"), ElementsAre(R"({"a":1} (null) (1, 2) (null))"));
+}
+
+TEST(LogLineTest, FormatsNothingBelowTheThreshold) {
+  MemoryLog log;
+  log.setThreshold("twrs", LogLevel::kError);
+  const LogCategory category(log, "com.orvane.tonewerk", "twrs");
+  bool wasAsked = false;
+  const auto expensive = [&] {
+    wasAsked = true;
+    return std::string("x");
+  };
+  defaultLog(category, "%@", expensive);
+  EXPECT_FALSE(wasAsked);
+  errorLog(category, "%@", expensive);
+  EXPECT_TRUE(wasAsked);
+  EXPECT_THAT(log.textsOf("twrs"), ElementsAre("x"));
 }
 
 }  // namespace

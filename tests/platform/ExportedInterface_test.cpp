@@ -1,0 +1,132 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/ExportedInterface.h"
+
+#include <gtest/gtest.h>
+#include <limits>
+
+namespace tonewerk {
+namespace {
+
+constexpr std::int64_t kMost = std::numeric_limits<std::int64_t>::max();
+constexpr std::int64_t kLeast = std::numeric_limits<std::int64_t>::min();
+
+std::optional<std::string> problemOf(ParameterType type, const Argument& argument) {
+  return problemWith(Method{"test", {{"it", type}}}, {argument});
+}
+
+void expectSuits(ParameterType type, const Argument& argument) {
+  EXPECT_EQ(problemOf(type, argument), std::nullopt) << (argument ? argument->text() : "nil");
+}
+
+void expectRefused(ParameterType type, const Argument& argument) {
+  EXPECT_NE(problemOf(type, argument), std::nullopt) << (argument ? argument->text() : "nil");
+}
+
+TEST(ExportedInterfaceTest, ASignedIntegerHasAllSixtyFourBits) {
+  constexpr ParameterType kType = ParameterType::kInt64;
+  for (const Value& value :
+       {Value(kLeast), Value(-1), Value(0), Value(kMost), Value(static_cast<std::uint64_t>(kMost))}) {
+    expectSuits(kType, value);
+  }
+  expectRefused(kType, Value(static_cast<std::uint64_t>(kMost) + 1));
+}
+
+TEST(ExportedInterfaceTest, AThirtyTwoBitIntegerReachesFromZeroTo4294967295) {
+  constexpr ParameterType kType = ParameterType::kUInt32;
+  for (const Value& value : {Value(0), Value(0U), Value(4294967295), Value(std::uint64_t{4294967295})}) {
+    expectSuits(kType, value);
+  }
+  for (const Value& value : {Value(-1), Value(4294967296), Value(std::uint64_t{4294967296}), Value(kLeast)}) {
+    expectRefused(kType, value);
+  }
+}
+
+TEST(ExportedInterfaceTest, ASixteenBitIntegerReachesFromZeroTo65535) {
+  constexpr ParameterType kType = ParameterType::kUInt16;
+  for (const Value& value : {Value(0), Value(65535), Value(std::uint64_t{65535})}) expectSuits(kType, value);
+  for (const Value& value : {Value(-1), Value(65536), Value(std::uint64_t{65536})})
+    expectRefused(kType, value);
+}
+
+TEST(ExportedInterfaceTest, NothingElseIsAnInteger) {
+  for (const ParameterType type : {ParameterType::kInt64, ParameterType::kUInt32, ParameterType::kUInt16}) {
+    expectRefused(type, Value(1.0));
+    expectRefused(type, Value(true));
+    expectRefused(type, Value("1"));
+    expectRefused(type, Value(Date{1}));
+    expectRefused(type, Value(ValueArray{1}));
+    expectRefused(type, std::nullopt);
+  }
+}
+
+TEST(ExportedInterfaceTest, AMapIsAMap) {
+  expectSuits(ParameterType::kMap, Value(ValueMap()));
+  expectRefused(ParameterType::kMap, Value(ValueArray()));
+  expectRefused(ParameterType::kMap, Value("{}"));
+  expectRefused(ParameterType::kMap, std::nullopt);
+}
+
+TEST(ExportedInterfaceTest, AListOfIntegersMayBeNilOrEmpty) {
+  constexpr ParameterType kType = ParameterType::kInt64ListOrNone;
+  expectSuits(kType, std::nullopt);
+  expectSuits(kType, Value(ValueArray()));
+  expectSuits(kType, Value(ValueArray{kLeast, 0U, kMost}));
+  expectRefused(kType, Value(ValueArray{1, 2.0}));
+  expectRefused(kType, Value(ValueArray{static_cast<std::uint64_t>(kMost) + 1}));
+  expectRefused(kType, Value(ValueArray{ValueArray()}));
+  expectRefused(kType, Value(1));
+  expectRefused(kType, Value(ValueMap()));
+}
+
+TEST(ExportedInterfaceTest, TheNumberOfArgumentsMustBeRight) {
+  const Method method{"two", {{"a", ParameterType::kInt64}, {"b", ParameterType::kInt64ListOrNone}}};
+  EXPECT_EQ(problemWith(method, {Value(1), std::nullopt}), std::nullopt);
+  EXPECT_EQ(problemWith(method, {Value(1)}), "two takes 2 arguments, not 1");
+  EXPECT_EQ(problemWith(method, {Value(1), std::nullopt, Value(2)}), "two takes 2 arguments, not 3");
+}
+
+TEST(ExportedInterfaceTest, AProblemNamesMethodAndArgument) {
+  const Method method{"send", {{"id", ParameterType::kInt64}, {"category", ParameterType::kUInt32}}};
+  EXPECT_EQ(problemWith(method, {Value(1), Value(-1)}),
+            "send: argument 2 (category) must be an integer from 0 to 4294967295");
+}
+
+TEST(ExportedInterfaceTest, FindsAMethodByItsWholeName) {
+  const ExportedInterface interface {
+    {
+      {"start", {}}, {
+        "stop", {}
+      }
+    }
+  };
+  EXPECT_EQ(interface.find("stop"), 1U);
+  EXPECT_EQ(interface.find("sto"), std::nullopt);
+  EXPECT_EQ(interface.find(""), std::nullopt);
+}
+
+class CountingGauge final : public RequestGauge {
+ public:
+  void finished(std::size_t size) override {
+    ++requests;
+    bytes += size;
+  }
+  int requests = 0;
+  std::size_t bytes = 0;
+};
+
+TEST(RequestTokenTest, FinishesItsRequestOnceWhereverItIsCarried) {
+  const auto gauge = std::make_shared<CountingGauge>();
+  {
+    RequestToken token(gauge, 10);
+    RequestToken carried = std::move(token);
+    RequestToken other(gauge, 5);
+    other = std::move(carried);
+    EXPECT_EQ(gauge->requests, 1);  // the one that was assigned over
+    EXPECT_EQ(gauge->bytes, 5U);
+  }
+  EXPECT_EQ(gauge->requests, 2);
+  EXPECT_EQ(gauge->bytes, 15U);
+}
+
+}  // namespace
+}  // namespace tonewerk
