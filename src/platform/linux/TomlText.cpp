@@ -2,8 +2,10 @@
 #include "platform/linux/TomlText.h"
 
 #include <algorithm>
+#include <array>
 #include <chrono>
 #include <cmath>
+#include <cstdio>
 #include <limits>
 #include <sstream>
 #include <toml++/toml.h>
@@ -18,24 +20,7 @@ Date dateOf(const toml::date_time& time) {
                      std::chrono::minutes(time.time.minute) + std::chrono::seconds(time.time.second) -
                      std::chrono::minutes(time.offset->minutes);
   const auto seconds = std::chrono::duration_cast<std::chrono::seconds>(whole).count();
-  return Date{static_cast<double>(seconds) + time.time.nanosecond * 1e-9};
-}
-
-// Only for dates that TOML can say.
-toml::date_time timeOf(Date date) {
-  const double floored = std::floor(date.seconds);
-  const std::chrono::nanoseconds fraction(
-      std::min(std::llround((date.seconds - floored) * 1e9), 999'999'999LL));
-  const std::chrono::sys_seconds time{std::chrono::seconds(static_cast<std::int64_t>(floored))};
-  const auto day = std::chrono::floor<std::chrono::days>(time);
-  const std::chrono::year_month_day calendar(day);
-  const std::chrono::hh_mm_ss clock(time - day);
-  return {
-      toml::date{static_cast<int>(calendar.year()), static_cast<unsigned>(calendar.month()),
-                 static_cast<unsigned>(calendar.day())},
-      toml::time{static_cast<unsigned>(clock.hours().count()), static_cast<unsigned>(clock.minutes().count()),
-                 static_cast<unsigned>(clock.seconds().count()), static_cast<unsigned>(fraction.count())},
-      toml::time_offset{}};
+  return Date{static_cast<double>(seconds) + time.time.nanosecond / 1e9};
 }
 
 bool canBeSaid(Date date) {
@@ -75,69 +60,130 @@ ValueMap valuesOf(const toml::table& table) {
   return map;
 }
 
-// Where a converted value goes: to the end of an array or under a key of a table.
-class Place {
+// Writes values as TOML, nested tables and arrays on the line of their key.
+//
+// Of our own, because the library's writer does not escape every key.
+class TomlWriter {
  public:
-  explicit Place(toml::array& array) : array_(&array) {}
-  Place(toml::table& table, std::string_view key) : table_(&table), key_(key) {}
+  const std::string& text() const { return text_; }
+  // What could not be said; empty when all could.
+  const std::string& problem() const { return problem_; }
 
-  template <typename T>
-  void put(T&& converted) {
-    if (array_ != nullptr) {
-      array_->push_back(std::forward<T>(converted));
-    } else {
-      table_->insert_or_assign(key_, std::forward<T>(converted));
+  void writeLines(const ValueMap& map) {
+    for (const ValueMapEntry& entry : map) {
+      writeEntry(entry);
+      text_ += '\n';
     }
   }
 
  private:
-  toml::array* array_ = nullptr;
-  toml::table* table_ = nullptr;
-  std::string_view key_;
-};
-
-toml::table tableOf(const ValueMap& map, std::string& problem);
-toml::array arrayOf(const ValueArray& values, std::string& problem);
-
-// Puts `value` in its place, or says in `problem` why that cannot be.
-void convert(const Value& value, Place place, std::string& problem) {
-  switch (value.kind()) {
-    case Value::Kind::kBoolean:
-      return place.put(*value.asBoolean());
-    case Value::Kind::kInteger:
-      return place.put(*value.asInteger());
-    case Value::Kind::kDouble:
-      return place.put(*value.asDouble());
-    case Value::Kind::kString:
-      return place.put(value.asString()->string());
-    case Value::Kind::kMap:
-      return place.put(tableOf(*value.asMap(), problem));
-    case Value::Kind::kArray:
-      return place.put(arrayOf(*value.asArray(), problem));
-    case Value::Kind::kUnsigned:
-      if (*value.asUnsigned() <= static_cast<std::uint64_t>(std::numeric_limits<std::int64_t>::max())) {
-        return place.put(static_cast<std::int64_t>(*value.asUnsigned()));
-      }
-      problem = value.text() + " is more than the greatest integer that TOML has, 9223372036854775807";
-      return;
-    case Value::Kind::kDate:
-      if (canBeSaid(*value.asDate())) return place.put(timeOf(*value.asDate()));
-      problem = "TOML's dates are those of the years 0 to 9999";
-      return;
+  void writeEntry(const ValueMapEntry& entry) {
+    writeKey(entry.key);
+    text_ += " = ";
+    writeValue(entry.value);
   }
-}
 
-toml::array arrayOf(const ValueArray& values, std::string& problem) {
-  toml::array array;
-  for (const Value& value : values) convert(value, Place(array), problem);
-  return array;
-}
+  void writeKey(std::string_view key) {
+    const bool isBare = !key.empty() && std::all_of(key.begin(), key.end(), [](char c) {
+      return (c >= 'a' && c <= 'z') || (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9') || c == '_' ||
+             c == '-';
+    });
+    if (isBare) {
+      text_ += key;
+    } else {
+      writeString(key);
+    }
+  }
 
-toml::table tableOf(const ValueMap& map, std::string& problem) {
-  toml::table table;
-  for (const ValueMap::Entry& entry : map) convert(entry.value, Place(table, entry.key.view()), problem);
-  return table;
-}
+  void writeValue(const Value& value) {
+    switch (value.kind()) {
+      case Value::Kind::kBoolean:
+        text_ += value.boolean() ? "true" : "false";
+        return;
+      case Value::Kind::kInteger:
+        text_ += value.text();
+        return;
+      case Value::Kind::kUnsigned:
+        return writeUnsigned(*value.asUnsigned());
+      case Value::Kind::kDouble:
+        return writeDouble(*value.asDouble());
+      case Value::Kind::kString:
+        return writeString(*value.asString());
+      case Value::Kind::kDate:
+        return writeDate(*value.asDate());
+      case Value::Kind::kArray:
+        return writeArray(*value.asArray());
+      case Value::Kind::kMap:
+        return writeTable(*value.asMap());
+    }
+  }
+
+  void writeUnsigned(std::uint64_t number) {
+    if (number > static_cast<std::uint64_t>(std::numeric_limits<std::int64_t>::max())) {
+      problem_ = std::to_string(number) + " is more than TOML's greatest integer, 9223372036854775807";
+    }
+    text_ += std::to_string(number);
+  }
+
+  void writeDouble(double number) {
+    const std::string digits = textOf(number);
+    text_ += digits;
+    // "2" would be an integer; "nan" and "inf" have a letter that no number has.
+    if (digits.find_first_of(".en") == std::string::npos) text_ += ".0";
+  }
+
+  void writeDate(Date date) {
+    if (!canBeSaid(date)) {
+      problem_ = "TOML's dates are those of the years 0 to 9999";
+      return;
+    }
+    const double whole = std::floor(date.seconds);
+    const long long nanoseconds = std::min(std::llround((date.seconds - whole) * 1e9), 999'999'999LL);
+    std::array<char, 16> fraction{};
+    std::snprintf(fraction.data(), fraction.size(), ".%09lldZ", nanoseconds);
+    text_ += textOf(Date{whole});
+    if (nanoseconds == 0) return;
+    text_.pop_back();  // the "Z"
+    text_ += fraction.data();
+  }
+
+  void writeString(std::string_view text) {
+    text_ += '"';
+    for (const char c : text) {
+      if (c == '"' || c == '\\') text_ += '\\';
+      const auto code = static_cast<unsigned char>(c);
+      if (code >= 0x20 && code != 0x7F) {
+        text_ += c;
+        continue;
+      }
+      std::array<char, 8> escape{};
+      std::snprintf(escape.data(), escape.size(), "\\u%04X", static_cast<unsigned>(code));
+      text_ += escape.data();
+    }
+    text_ += '"';
+  }
+
+  void writeArray(const ValueArray& array) {
+    text_ += '[';
+    for (const Value& element : array) {
+      if (&element != array.begin()) text_ += ", ";
+      writeValue(element);
+    }
+    text_ += ']';
+  }
+
+  void writeTable(const ValueMap& map) {
+    text_ += '{';
+    for (const ValueMapEntry& entry : map) {
+      if (&entry != map.begin()) text_ += ", ";
+      writeEntry(entry);
+    }
+    text_ += '}';
+  }
+
+  std::string text_;
+  std::string problem_;
+};
 
 }  // namespace
 
@@ -155,23 +201,15 @@ std::optional<ValueMap> parseToml(std::string_view text, std::string& problem) {
 }
 
 std::optional<std::string> tomlText(const ValueMap& map, std::string& problem) {
-  problem.clear();
-  std::string text;
-  try {
-    const toml::table table = tableOf(map, problem);
-    if (!problem.empty()) return std::nullopt;
-    std::ostringstream out;
-    if (!table.empty()) out << table << '\n';
-    text = out.str();
-  } catch (const std::exception& error) {
-    problem = error.what();
-    return std::nullopt;
-  }
+  TomlWriter writer;
+  writer.writeLines(map);
+  problem = writer.problem();
+  if (!problem.empty()) return std::nullopt;
   // What cannot be read again (texts that are no UTF-8, values nested too deeply) would lose everything else
   // in the file, too.
   std::string unreadable;
-  const std::optional<ValueMap> readBack = parseToml(text, unreadable);
-  if (readBack && *readBack == map) return text;
+  const std::optional<ValueMap> readBack = parseToml(writer.text(), unreadable);
+  if (readBack && *readBack == map) return writer.text();
   problem = readBack ? "TOML cannot express the value" : "TOML cannot express the value (" + unreadable + ")";
   return std::nullopt;
 }
