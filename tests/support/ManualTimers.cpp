@@ -30,6 +30,7 @@ std::size_t ManualTimers::count() const {
 
 std::optional<std::chrono::nanoseconds> ManualTimers::nextDue() const {
   const std::lock_guard lock(mutex_);
+  if (isTicking_) return std::nullopt;  // a tick moves the clock
   const std::shared_ptr<Entry> next = earliest();
   return next == nullptr ? std::nullopt : std::optional(next->due);
 }
@@ -44,8 +45,11 @@ void ManualTimers::runNext() {
     // Missed ticks are not made up for: the next one is the first that still lies ahead.
     const std::chrono::nanoseconds late = clock_.monotonic() - entry->due;
     entry->due += entry->interval * (late / entry->interval + 1);
+    isTicking_ = true;
   }
   entry->tick();
+  const std::lock_guard lock(mutex_);
+  isTicking_ = false;
 }
 
 std::shared_ptr<ManualTimers::Entry> ManualTimers::earliest() const {

@@ -47,7 +47,8 @@ class ManualTimers final : public TimerService, private ManualClock::Alarm {
   std::shared_ptr<Entry> earliest() const;
 
   ManualClock& clock_;
-  mutable std::mutex mutex_;                   // guards entries_ and their times
+  mutable std::mutex mutex_;                   // guards all below
+  bool isTicking_ = false;                     // no tick runs inside another
   std::vector<std::weak_ptr<Entry>> entries_;  // a timer owns its entry
 };
 

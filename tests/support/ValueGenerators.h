@@ -97,7 +97,7 @@ inline rc::Gen<double> number() {
 inline rc::Gen<Date> date() {
   return rc::gen::apply(
       [](std::int64_t seconds, int micros) {
-        return Date{static_cast<double>(seconds) + static_cast<double>(micros) * 1e-6};
+        return Date{static_cast<double>(seconds) + static_cast<double>(micros) / 1e6};
       },
       rc::gen::oneOf(rc::gen::inRange<std::int64_t>(1'600'000'000, 1'900'000'000),
                      rc::gen::inRange<std::int64_t>(-62'167'219'200, 253'402'300'799),
