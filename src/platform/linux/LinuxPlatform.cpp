@@ -1,6 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/LinuxPlatform.h"
 
+#include <filesystem>
+#include <string>
+
 #include "platform/LogCategory.h"
 #include "platform/linux/Directories.h"
 #include "platform/linux/LinuxFileSystem.h"
@@ -16,13 +19,25 @@
 #include "platform/linux/UsdtTracePoints.h"
 
 namespace tonewerk {
+namespace {
+
+// As it is when the working directory is gone.
+std::string absolutePath(const std::string& path) {
+  std::error_code error;
+  const std::filesystem::path absolute = std::filesystem::absolute(path, error);
+  return error ? path : absolute.string();
+}
+
+}  // namespace
 
 struct LinuxPlatform::Adapters {
   explicit Adapters(const Directories& directories)
-      : deviceFacts(directories.configuration + "/device-facts.toml", category),
+      : logsDirectory(absolutePath(directories.logs)),
+        deviceFacts(directories.configuration + "/device-facts.toml", category),
         preferences(directories.configuration + "/preferences", directories.state + "/preferences",
                     category) {}
 
+  const std::string logsDirectory;
   SystemClock clock;
   std::unique_ptr<Log> log = makeStandardLog(clock);
   LogCategory category{*log, "com.orvane.tonewerk", "twrs"};  // the adapters' own lines
@@ -50,8 +65,8 @@ JsonService& LinuxPlatform::json() { return adapters_->json; }
 
 Platform LinuxPlatform::platform(Metricon& metricon) {
   Adapters& a = *adapters_;
-  return {*a.log,   a.tracePoints, a.clock,       a.queues, a.timers, a.processes,
-          a.system, a.deviceFacts, a.preferences, a.files,  a.json,   metricon};
+  return {*a.log,        a.tracePoints, a.clock, a.queues, a.timers, a.processes,    a.system,
+          a.deviceFacts, a.preferences, a.files, a.json,   metricon, a.logsDirectory};
 }
 
 }  // namespace tonewerk
