@@ -1,0 +1,169 @@
+// SPDX-License-Identifier: Apache-2.0
+#include <filesystem>
+#include <fstream>
+#include <gtest/gtest.h>
+#include <sstream>
+#include <sys/stat.h>
+
+#include "platform/linux/LinuxFileSystem.h"
+#include "support/MemoryFileSystem.h"
+#include "support/TemporaryDirectory.h"
+
+namespace tonewerk {
+namespace {
+
+struct OnDisk {
+  TemporaryDirectory directory;
+  LinuxFileSystem files;
+
+  std::string root() const { return directory.path(); }
+  static std::optional<std::string> contents(const std::string& path) {
+    std::ifstream file(path);
+    if (!file) return std::nullopt;
+    std::ostringstream text;
+    text << file.rdbuf();
+    return text.str();
+  }
+  static unsigned modeOf(const std::string& path) {
+    struct stat status {};
+    EXPECT_EQ(stat(path.c_str(), &status), 0);
+    return status.st_mode & 07777U;
+  }
+  static void addSymbolicLink(const std::string& path) { std::filesystem::create_symlink("/dev/null", path); }
+};
+
+struct InMemory {
+  MemoryFileSystem files;
+
+  static std::string root() { return "/root"; }
+  std::optional<std::string> contents(const std::string& path) const { return files.contents(path); }
+  unsigned modeOf(const std::string& path) const { return files.directoryMode(path).value_or(0); }
+  void addSymbolicLink(const std::string& path) { files.addSymbolicLink(path); }
+};
+
+// What every file system does.
+template <typename Kind>
+class FileSystemContract : public testing::Test {
+ protected:
+  FileSystemContract() : error_(kind_.files.createDirectories(path("d"), 0755)) { EXPECT_FALSE(error_); }
+  std::string path(const std::string& name) const { return kind_.root() + "/" + name; }
+  std::unique_ptr<WritableFile> create(const std::string& name) {
+    return kind_.files.createFile(path("d"), name, error_);
+  }
+
+  Kind kind_;
+  std::error_code error_;
+};
+
+using Kinds = testing::Types<OnDisk, InMemory>;
+TYPED_TEST_SUITE(FileSystemContract, Kinds);
+
+TYPED_TEST(FileSystemContract, WritesAFile) {
+  const auto file = this->create("name.json");
+  ASSERT_NE(file, nullptr);
+  EXPECT_FALSE(this->error_);
+  EXPECT_FALSE(file->write("one "));
+  EXPECT_FALSE(file->write(""));
+  EXPECT_FALSE(file->write("two"));
+  EXPECT_FALSE(file->close());
+  EXPECT_EQ(this->kind_.contents(this->path("d/name.json")), "one two");
+}
+
+TYPED_TEST(FileSystemContract, EmptiesAFileThatIsThere) {
+  for (const char* text : {"a long text", "short"}) {
+    const auto file = this->create("name");
+    EXPECT_FALSE(file->write(text));
+    EXPECT_FALSE(file->close());
+  }
+  EXPECT_EQ(this->kind_.contents(this->path("d/name")), "short");
+}
+
+TYPED_TEST(FileSystemContract, AFileThatIsNotClosedKeepsWhatWasWritten) {
+  EXPECT_FALSE(this->create("name")->write("x"));
+  EXPECT_EQ(this->kind_.contents(this->path("d/name")), "x");
+}
+
+TYPED_TEST(FileSystemContract, NamesThatWouldLeaveTheDirectoryAreRefused) {
+  for (const std::string& name : {std::string(""), std::string("."), std::string(".."), std::string("../x"),
+                                  std::string("a/b"), std::string("/x"), std::string("a\0b", 3)}) {
+    EXPECT_EQ(this->create(name), nullptr);
+    EXPECT_EQ(this->error_, std::errc::invalid_argument);
+  }
+}
+
+TYPED_TEST(FileSystemContract, ASymbolicLinkIsNotFollowed) {
+  this->kind_.addSymbolicLink(this->path("d/link"));
+  EXPECT_EQ(this->create("link"), nullptr);
+  EXPECT_EQ(this->error_, std::errc::too_many_symbolic_link_levels);
+}
+
+TYPED_TEST(FileSystemContract, ADirectoryIsNoFile) {
+  EXPECT_FALSE(this->kind_.files.createDirectories(this->path("d/inner"), 0755));
+  EXPECT_EQ(this->create("inner"), nullptr);
+  EXPECT_EQ(this->error_, std::errc::is_a_directory);
+}
+
+TYPED_TEST(FileSystemContract, AFileNeedsItsDirectory) {
+  EXPECT_EQ(this->kind_.files.createFile(this->path("nowhere"), "x", this->error_), nullptr);
+  EXPECT_EQ(this->error_, std::errc::no_such_file_or_directory);
+}
+
+TYPED_TEST(FileSystemContract, DirectoriesGetExactlyTheirMode) {
+  EXPECT_FALSE(this->kind_.files.createDirectories(this->path("a/b/c"), 0777));
+  for (const char* name : {"a", "a/b", "a/b/c"})
+    EXPECT_EQ(this->kind_.modeOf(this->path(name)), 0777U) << name;
+  // Those that were there keep theirs.
+  EXPECT_FALSE(this->kind_.files.createDirectories(this->path("a/b/d"), 0700));
+  EXPECT_EQ(this->kind_.modeOf(this->path("a/b")), 0777U);
+  EXPECT_EQ(this->kind_.modeOf(this->path("a/b/d")), 0700U);
+  EXPECT_FALSE(this->kind_.files.createDirectories(this->path("a/b/d"), 0755));
+  EXPECT_EQ(this->kind_.modeOf(this->path("a/b/d")), 0700U);
+}
+
+TYPED_TEST(FileSystemContract, AFileInTheWayOfADirectoryIsAnError) {
+  EXPECT_FALSE(this->create("file")->close());
+  EXPECT_EQ(this->kind_.files.createDirectories(this->path("d/file"), 0755), std::errc::not_a_directory);
+  EXPECT_EQ(this->kind_.files.createDirectories(this->path("d/file/below"), 0755),
+            std::errc::not_a_directory);
+}
+
+TEST(LinuxFileSystemTest, APipeInTheFilesPlaceNeitherBlocksNorIsWritten) {
+  const TemporaryDirectory directory;
+  ASSERT_EQ(mkfifo(directory.path("pipe").c_str(), 0600), 0);
+  std::error_code error;
+  EXPECT_EQ(LinuxFileSystem().createFile(directory.path(), "pipe", error), nullptr);
+  EXPECT_TRUE(error);
+}
+
+TEST(LinuxFileSystemTest, ATrailingSlashDoesNoHarm) {
+  const TemporaryDirectory directory;
+  EXPECT_FALSE(LinuxFileSystem().createDirectories(directory.path("a/b/"), 0755));
+  EXPECT_TRUE(std::filesystem::is_directory(directory.path("a/b")));
+}
+
+TEST(LinuxFileSystemTest, ADeviceIsNotWritten) {
+  std::error_code error;
+  EXPECT_EQ(LinuxFileSystem().createFile("/dev", "null", error), nullptr);
+  EXPECT_EQ(error, std::errc::operation_not_permitted);
+}
+
+TEST(MemoryFileSystemTest, FailsOnDemand) {
+  MemoryFileSystem files;
+  std::error_code error;
+  files.failWrite(2, std::errc::no_space_on_device);
+  files.failClose(std::errc::io_error);
+  const auto file = files.createFile("/", "x", error);
+  ASSERT_NE(file, nullptr);
+  EXPECT_FALSE(file->write("a"));
+  EXPECT_EQ(file->write("b"), std::errc::no_space_on_device);
+  EXPECT_FALSE(file->write("c"));
+  EXPECT_EQ(files.openFiles(), 1);
+  EXPECT_EQ(file->close(), std::errc::io_error);
+  EXPECT_EQ(files.openFiles(), 0);
+  files.failCreateFile(std::errc::permission_denied);
+  EXPECT_EQ(files.createFile("/", "y", error), nullptr);
+  EXPECT_EQ(error, std::errc::permission_denied);
+}
+
+}  // namespace
+}  // namespace tonewerk
