@@ -1,12 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <future>
+#include <condition_variable>
 #include <map>
 #include <memory>
 #include <mutex>
 #include <optional>
 #include <string>
+#include <thread>
 #include <utility>
 #include <vector>
 
@@ -20,7 +21,7 @@ namespace tonewerk {
 
 // A daemon with the real request set on a real socket, whose answers a test says beforehand. Requests without
 // a scripted answer are answered with true, a start and the kill request with nothing.
-class ScriptedDaemon final : private MessagingListenerDelegate {
+class ScriptedDaemon {
  public:
   struct Request {
     std::string method;
@@ -30,14 +31,15 @@ class ScriptedDaemon final : private MessagingListenerDelegate {
   explicit ScriptedDaemon(const std::string& path) {
     std::string problem;
     listener_.emplace(ServerSocket::open(path, problem), category_);
-    listener_->setDelegate(*this);
+    listener_->setDelegate(delegate_);
     listener_->resume();
+    ender_ = std::thread([this] { waitForTheEnd(); });
   }
   ScriptedDaemon(const ScriptedDaemon&) = delete;
   ScriptedDaemon& operator=(const ScriptedDaemon&) = delete;
-  ~ScriptedDaemon() override {
-    if (ended_.valid()) ended_.wait();
-    listener_->shutDown();
+  ~ScriptedDaemon() {
+    end();
+    ender_.join();
   }
 
   // Before the first request.
@@ -63,10 +65,33 @@ class ScriptedDaemon final : private MessagingListenerDelegate {
     ScriptedDaemon& daemon_;
   };
 
-  bool listenerShouldAcceptNewConnection(MessagingConnection& connection) override {
-    connection.exportObject(TWReportingServiceExport::exportedInterface(), std::make_shared<Object>(*this));
-    connection.resume();
-    return true;
+  class Delegate final : public MessagingListenerDelegate {
+   public:
+    explicit Delegate(ScriptedDaemon& daemon) : daemon_(daemon) {}
+    bool listenerShouldAcceptNewConnection(MessagingConnection& connection) override {
+      connection.exportObject(TWReportingServiceExport::exportedInterface(),
+                              std::make_shared<Object>(daemon_));
+      connection.resume();
+      return true;
+    }
+
+   private:
+    ScriptedDaemon& daemon_;
+  };
+
+  void end() {
+    const std::lock_guard lock(mutex_);
+    ends_ = true;
+    ending_.notify_one();
+  }
+
+  // The listener cannot be ended on its own thread, where the kill request arrives.
+  void waitForTheEnd() {
+    {
+      std::unique_lock lock(mutex_);
+      ending_.wait(lock, [this] { return ends_; });
+    }
+    listener_->shutDown();
   }
 
   void handle(const std::string& method, Arguments arguments, const Reply& reply) {
@@ -77,10 +102,7 @@ class ScriptedDaemon final : private MessagingListenerDelegate {
     if (errors_.contains(method)) return reply(errors_[method]);
     if (results_.contains(method)) return reply(std::nullopt, results_[method]);
     if (method == "startReportingSessionForID") return;
-    if (method == "killService") {
-      ended_ = std::async(std::launch::async, [this] { listener_->shutDown(); });
-      return;
-    }
+    if (method == "killService") return end();
     reply(std::nullopt, Value(true));
   }
 
@@ -89,9 +111,14 @@ class ScriptedDaemon final : private MessagingListenerDelegate {
   std::map<std::string, Value> results_;
   std::map<std::string, ReplyError> errors_;
   mutable std::mutex mutex_;
-  std::vector<Request> requests_;  // guarded by mutex_
+  std::condition_variable ending_;
+  // Guarded by mutex_.
+  std::vector<Request> requests_;
+  bool ends_ = false;
+
+  Delegate delegate_{*this};
   std::optional<UnixSocketListener> listener_;
-  std::future<void> ended_;
+  std::thread ender_;
 };
 
 }  // namespace tonewerk
