@@ -1,0 +1,143 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "ServerProcess.h"
+
+#include <cerrno>
+#include <csignal>
+#include <cstdlib>
+#include <cstring>
+#include <ctime>
+#include <fcntl.h>
+#include <filesystem>
+#include <fstream>
+#include <sstream>
+#include <stdexcept>
+#include <sys/prctl.h>
+#include <sys/wait.h>
+#include <thread>
+#include <unistd.h>
+
+namespace tonewerk {
+namespace {
+
+constexpr std::chrono::milliseconds kStep{20};
+constexpr std::chrono::seconds kPatience{20};
+
+// Longer than the store gathers a batch.
+constexpr int kIdleSteps = 15;
+// What a server that waits spends in a step.
+constexpr ServerProcess::Processor kIdleTime = std::chrono::microseconds(200);
+
+const char* const kDirectoryVariables[] = {"RUNTIME_DIRECTORY", "STATE_DIRECTORY", "LOGS_DIRECTORY",
+                                           "CONFIGURATION_DIRECTORY"};
+
+std::string textOfFile(const std::string& path) {
+  std::ifstream file(path);
+  std::ostringstream text;
+  text << file.rdbuf();
+  return text.str();
+}
+
+// In the child. Only calls that may follow a fork.
+[[noreturn]] void become(const std::vector<char*>& command, int output) {
+  ::prctl(PR_SET_PDEATHSIG, SIGKILL);  // never outlives the benchmark
+  ::dup2(output, STDOUT_FILENO);
+  ::dup2(output, STDERR_FILENO);
+  ::execv(command[0], command.data());
+  ::_exit(127);
+}
+
+}  // namespace
+
+ServerProcess::ServerProcess() {
+  std::string name = std::filesystem::temp_directory_path() / "tonewerk-benchmark-XXXXXX";
+  if (::mkdtemp(name.data()) == nullptr) throw std::runtime_error("cannot make a temporary directory");
+  directory_ = name;
+}
+
+ServerProcess::~ServerProcess() {
+  stop();
+  std::error_code error;
+  std::filesystem::remove_all(directory_, error);
+}
+
+void ServerProcess::start(const std::string& program, const std::vector<std::string>& arguments) {
+  for (const char* variable : kDirectoryVariables) ::setenv(variable, directory_.c_str(), 1);
+  std::vector<char*> command{const_cast<char*>(program.c_str())};
+  for (const std::string& argument : arguments) command.push_back(const_cast<char*>(argument.c_str()));
+  command.push_back(nullptr);
+  const int output = ::open((directory_ + "/output").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
+  process_ = ::fork();
+  if (process_ == 0) become(command, output);
+  ::close(output);
+  if (process_ < 0) throw std::runtime_error("cannot start " + program);
+  const auto giveUpAt = std::chrono::steady_clock::now() + kPatience;
+  while (!std::filesystem::exists(socketPath())) {
+    if (hasEnded()) failWithOutput(program + " has ended");
+    if (std::chrono::steady_clock::now() > giveUpAt) failWithOutput(program + " does not listen");
+    std::this_thread::sleep_for(kStep);
+  }
+  waitUntilIdle();
+}
+
+ServerProcess::Processor ServerProcess::processorTime() const {
+  clockid_t clock{};
+  timespec time{};
+  if (::clock_getcpuclockid(process_, &clock) != 0 || ::clock_gettime(clock, &time) != 0) {
+    failWithOutput("the server has ended");
+  }
+  return std::chrono::seconds(time.tv_sec) + std::chrono::nanoseconds(time.tv_nsec);
+}
+
+std::map<std::string, ServerProcess::Processor> ServerProcess::processorTimeByThread() const {
+  std::map<std::string, Processor> times;
+  std::error_code error;
+  for (const auto& thread :
+       std::filesystem::directory_iterator("/proc/" + std::to_string(process_) + "/task", error)) {
+    std::string name = textOfFile(thread.path() / "comm");
+    if (!name.empty()) name.pop_back();
+    // The first number: nanoseconds on a processor.
+    times[name] += Processor(std::atoll(textOfFile(thread.path() / "schedstat").c_str()));
+  }
+  return times;
+}
+
+std::size_t ServerProcess::peakMemory() const {
+  const std::string status = textOfFile("/proc/" + std::to_string(process_) + "/status");
+  constexpr std::string_view kLabel = "VmHWM:";
+  const std::size_t at = status.find(kLabel);
+  if (at == std::string::npos) return 0;
+  return static_cast<std::size_t>(std::atoll(status.c_str() + at + kLabel.size())) * 1024;
+}
+
+void ServerProcess::waitUntilIdle() const {
+  const auto giveUpAt = std::chrono::steady_clock::now() + kPatience;
+  Processor before = processorTime();
+  for (int idle = 0; idle < kIdleSteps;) {
+    std::this_thread::sleep_for(kStep);
+    const Processor now = processorTime();
+    idle = now - before < kIdleTime ? idle + 1 : 0;
+    before = now;
+    if (std::chrono::steady_clock::now() > giveUpAt) failWithOutput("the server does not come to rest");
+  }
+}
+
+void ServerProcess::failWithOutput(const std::string& what) const {
+  throw std::runtime_error(what + ". It said:\n" + textOfFile(directory_ + "/output"));
+}
+
+bool ServerProcess::hasEnded() {
+  if (process_ > 0 && ::waitpid(process_, nullptr, WNOHANG) == process_) process_ = -1;
+  return process_ < 0;
+}
+
+void ServerProcess::stop() {
+  if (process_ < 0) return;
+  ::kill(process_, SIGTERM);
+  const auto giveUpAt = std::chrono::steady_clock::now() + kPatience;
+  while (!hasEnded()) {
+    if (std::chrono::steady_clock::now() > giveUpAt) ::kill(process_, SIGKILL);
+    std::this_thread::sleep_for(kStep);
+  }
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,269 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What a message costs in the core: normalised, judged, stored and delivered to every worker of a started
+// session, without a socket before it and a store behind it. How that grows with stored messages, keys and
+// sessions; what the payload's map costs by itself.
+
+#include <benchmark/benchmark.h>
+#include <chrono>
+#include <cstdint>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "platform/Clock.h"
+#include "platform/Log.h"
+#include "platform/Metricon.h"
+#include "platform/TracePoints.h"
+#include "session/TWReportingContext.h"
+#include "session/TWReportingSession.h"
+#include "session/TWReportingSessionMessage.h"
+#include "support/TestPlatform.h"
+#include "workers/TWReportingWorkerClasses.h"
+
+namespace tonewerk {
+namespace {
+
+constexpr AudioEventCategory kPlayback = 4;
+// Records made at a time, outside of what is measured.
+constexpr std::size_t kBatch = 512;
+// Messages that a session stores beyond what it began with, before another takes its place.
+constexpr std::size_t kMostAdded = 16'384;
+// A client may keep 256 MiB; 100,000 messages of 64 keys are more, and what is not kept is not measured.
+constexpr std::size_t kUnbounded = std::size_t{1} << 40;
+
+// Doubles that cost what a quiet daemon's adapters cost, and keep nothing.
+class QuietLog final : public Log {
+ public:
+  bool isEnabled(std::string_view, LogLevel level) const override { return level >= LogLevel::kDefault; }
+  void write(std::string_view, std::string_view, LogLevel, std::string_view) override {}
+};
+
+class SilentTracePoints final : public TracePoints {
+ public:
+  void emit(std::uint32_t) override {}
+};
+
+class RunningClock final : public Clock {
+ public:
+  double now() const override {
+    return std::chrono::duration<double>(std::chrono::system_clock::now().time_since_epoch()).count();
+  }
+  std::chrono::nanoseconds monotonic() const override {
+    return std::chrono::steady_clock::now().time_since_epoch();
+  }
+  std::chrono::minutes utcOffset(double) const override { return {}; }
+};
+
+class CountingMetricon final : public Metricon {
+ public:
+  bool isEventUsed(std::string_view) override { return true; }
+  void sendEvent(const SharedString&, const UniqueFunction<ValueMap()>& payload) override {
+    benchmark::DoNotOptimize(payload());
+    ++events;
+  }
+  std::uint64_t events = 0;
+};
+
+class Core {
+ public:
+  Core() : context_(platform(), allWorkerClasses()) {}
+
+  std::shared_ptr<TWReportingSession> makeSession(ReporterID reporterID) {
+    auto session =
+        TWReportingSession::initWithID(reporterID, {4711}, std::make_shared<KeptBytesBudget>(kUnbounded));
+    const ValueMap configuration{{"HostApplicationDisplayID", "com.example.player"}};
+    session->updateConfigurationWithContentsOfConfiguration(&configuration);
+    session->start();
+    return session;
+  }
+
+  std::uint64_t events() const { return metricon_.events; }
+
+ private:
+  Platform platform() {
+    return {log_,
+            tracePoints_,
+            clock_,
+            doubles_.queues,
+            doubles_.timers,
+            doubles_.processes,
+            doubles_.system,
+            doubles_.deviceFacts,
+            doubles_.preferences,
+            doubles_.files,
+            doubles_.json,
+            metricon_,
+            "/logs"};
+  }
+
+  TestPlatform doubles_;
+  QuietLog log_;
+  SilentTracePoints tracePoints_;
+  RunningClock clock_;
+  CountingMetricon metricon_;
+  TWReportingContext context_;
+};
+
+using Record = std::shared_ptr<TWReportingSessionMessage>;
+
+// Makes messages of so many keys as a connection does: the keys are shared, the map is the message's own.
+class Messages {
+ public:
+  Messages(std::size_t keys, bool isChanging) : isChanging_(isChanging) {
+    for (std::size_t at = 2; at < keys; ++at) keys_.emplace_back("some_property_" + std::to_string(at));
+  }
+
+  ValueMap payload() {
+    ++count_;
+    ValueMap payload;
+    payload.reserve(keys_.size() + 2);
+    payload.set(timeKey_, start_ + static_cast<double>(count_));
+    payload.set(positionKey_, isChanging_ ? count_ : 0);
+    for (const SharedString& key : keys_) payload.set(key, 48'000);
+    return payload;
+  }
+
+  std::vector<Record> records(std::size_t count) {
+    std::vector<Record> records;
+    records.reserve(count);
+    for (std::size_t at = 0; at < count; ++at) {
+      records.push_back(std::make_shared<TWReportingSessionMessage>(payload(), kPlayback, kTypeGeneric));
+    }
+    return records;
+  }
+
+ private:
+  const double start_ = RunningClock().now();
+  const SharedString timeKey_{"twreporting_timestamp"};
+  const SharedString positionKey_{"position"};
+  std::vector<SharedString> keys_;
+  const bool isChanging_;
+  std::int64_t count_ = 0;
+};
+
+void fill(TWReportingSession& session, std::size_t stored, std::size_t keys) {
+  Messages messages(keys, true);
+  for (const Record& record : messages.records(stored)) session.sendMessage(record);
+}
+
+// Of `keys` keys to a session that stores `stored` messages, and some thousands more when sending stores
+// them.
+void sendMessage(benchmark::State& state, bool isChanging) {
+  const auto stored = static_cast<std::size_t>(state.range(0));
+  const auto keys = static_cast<std::size_t>(state.range(1));
+  Core core;
+  auto session = core.makeSession(77);
+  fill(*session, stored, keys);
+  Messages messages(keys, isChanging);
+  session->sendMessage(messages.records(1).front());
+  std::vector<Record> records;
+  std::size_t next = 0;
+  for (auto _ : state) {
+    if (next == records.size()) {
+      state.PauseTiming();
+      if (session->messages().size() > stored + kMostAdded) {
+        session.reset();
+        session = core.makeSession(77);
+        fill(*session, stored, keys);
+      }
+      records = messages.records(kBatch);
+      next = 0;
+      state.ResumeTiming();
+    }
+    session->sendMessage(records[next++]);
+  }
+  const std::size_t now = session->messages().size();
+  if (!isChanging && now > stored + 3) state.SkipWithError("redundant messages were stored");
+  if (core.events() == 0) state.SkipWithError("no worker got a message");
+}
+
+void SendChanging(benchmark::State& state) { sendMessage(state, true); }
+void SendRedundant(benchmark::State& state) { sendMessage(state, false); }
+
+#define TONEWERK_STORED_AND_KEYS ArgNames({"stored", "keys"})->ArgsProduct({{1, 100, 100'000}, {8, 64}})
+BENCHMARK(SendChanging)->TONEWERK_STORED_AND_KEYS;
+BENCHMARK(SendRedundant)->TONEWERK_STORED_AND_KEYS;
+
+// One message after the other to so many sessions in turn; each stores a few.
+void SendToSessions(benchmark::State& state) {
+  constexpr std::size_t kKeys = 8;
+  constexpr std::size_t kMostMessages = 100'000;
+  Core core;
+  std::vector<std::shared_ptr<TWReportingSession>> sessions;
+  const auto begin = [&] {
+    sessions.clear();
+    for (std::int64_t at = 0; at < state.range(0); ++at) sessions.push_back(core.makeSession(100 + at));
+  };
+  begin();
+  Messages messages(kKeys, true);
+  std::vector<Record> records;
+  std::size_t sent = 0;
+  for (auto _ : state) {
+    if (sent % kBatch == 0) {
+      state.PauseTiming();
+      if (sent % kMostMessages < kBatch) begin();
+      records = messages.records(kBatch);
+      state.ResumeTiming();
+    }
+    sessions[sent % sessions.size()]->sendMessage(records[sent % kBatch]);
+    ++sent;
+  }
+}
+BENCHMARK(SendToSessions)->ArgName("sessions")->Arg(1)->Arg(1000);
+
+// The stop of a session that stores so many messages: sorting them, and every worker's report. Per stop.
+void Stop(benchmark::State& state) {
+  const auto stored = static_cast<std::size_t>(state.range(0));
+  Core core;
+  for (auto _ : state) {
+    state.PauseTiming();
+    const auto session = core.makeSession(77);
+    fill(*session, stored, 8);
+    state.ResumeTiming();
+    session->stop();
+  }
+  state.SetItemsProcessed(state.iterations() * state.range(0));
+}
+BENCHMARK(Stop)->ArgName("stored")->Arg(1)->Arg(1000)->Arg(100'000)->Unit(benchmark::kMicrosecond);
+
+// A payload's map by itself.
+void MakePayload(benchmark::State& state) {
+  Messages messages(static_cast<std::size_t>(state.range(0)), true);
+  for (auto _ : state) benchmark::DoNotOptimize(messages.payload());
+}
+BENCHMARK(MakePayload)->ArgName("keys")->Arg(8)->Arg(64);
+
+void CopyPayload(benchmark::State& state) {
+  const ValueMap payload = Messages(static_cast<std::size_t>(state.range(0)), true).payload();
+  for (auto _ : state) {
+    ValueMap copy = payload;
+    benchmark::DoNotOptimize(copy);
+  }
+}
+BENCHMARK(CopyPayload)->ArgName("keys")->Arg(8)->Arg(64);
+
+void CopyAndChangePayload(benchmark::State& state) {
+  const ValueMap payload = Messages(static_cast<std::size_t>(state.range(0)), true).payload();
+  const SharedString key("position");
+  for (auto _ : state) {
+    ValueMap copy = payload;
+    copy.set(key, 7);
+    benchmark::DoNotOptimize(copy);
+  }
+}
+BENCHMARK(CopyAndChangePayload)->ArgName("keys")->Arg(8)->Arg(64);
+
+void MergePayload(benchmark::State& state) {
+  Messages messages(static_cast<std::size_t>(state.range(0)), true);
+  ValueMap previous = messages.payload();
+  previous.set("another", true);
+  const ValueMap payload = messages.payload();
+  for (auto _ : state) previous.merge(payload);
+}
+BENCHMARK(MergePayload)->ArgName("keys")->Arg(8)->Arg(64);
+
+}  // namespace
+}  // namespace tonewerk
+
+BENCHMARK_MAIN();
