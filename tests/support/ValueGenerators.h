@@ -122,13 +122,13 @@ inline rc::Gen<std::string> key() {
 inline rc::Gen<Value> value(int depth = 3);
 
 inline rc::Gen<ValueMap> map(int depth = 3) {
-  return rc::gen::map(
-      rc::gen::container<std::vector<std::pair<std::string, Value>>>(rc::gen::pair(key(), value(depth - 1))),
-      [](const std::vector<std::pair<std::string, Value>>& entries) {
-        ValueMap made;
-        for (const auto& [name, held] : entries) made.set(name, held);
-        return made;
-      });
+  return rc::gen::map(rc::gen::scale(0.4, rc::gen::container<std::vector<std::pair<std::string, Value>>>(
+                                              rc::gen::pair(key(), value(depth - 1)))),
+                      [](const std::vector<std::pair<std::string, Value>>& entries) {
+                        ValueMap made;
+                        for (const auto& [name, held] : entries) made.set(name, held);
+                        return made;
+                      });
 }
 
 inline rc::Gen<Value> value(int depth) {

@@ -85,6 +85,7 @@ TYPED_TEST(SerialQueueContract, TakesWorkFromSeveralThreadsInEachOnesOrder) {
   int outOfOrder = 0;
   {
     std::vector<std::jthread> threads;
+    threads.reserve(kThreads);
     for (int thread = 0; thread < kThreads; ++thread) {
       threads.emplace_back([&, thread] {
         for (int number = 0; number < kEach; ++number) {

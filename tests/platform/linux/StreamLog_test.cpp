@@ -73,6 +73,7 @@ TEST(StreamLogTest, LinesOfSeveralThreadsStayWhole) {
   StreamLog log(pipe.writer(), clock);
   {
     std::vector<std::jthread> threads;
+    threads.reserve(kThreads);
     for (int thread = 0; thread < kThreads; ++thread) {
       threads.emplace_back([&log, thread] {
         for (int line = 0; line < kLines; ++line) {

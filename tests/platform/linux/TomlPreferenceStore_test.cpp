@@ -89,6 +89,7 @@ TEST_F(TomlPreferenceStoreTest, WritersDoNotLoseEachOthersKeys) {
   constexpr int kKeys = 25;
   {
     std::vector<std::jthread> writers;
+    writers.reserve(kWriters);
     for (int writer = 0; writer < kWriters; ++writer) {
       writers.emplace_back([this, writer] {
         TomlPreferenceStore own(directory_.path("configuration"), directory_.path("state"), category_);
