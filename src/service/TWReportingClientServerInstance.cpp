@@ -167,8 +167,9 @@ void TWReportingClientServerInstance::sendMessage(ValueMap message, AudioEventCa
                 }
                 const std::vector<Session> sessions = delegate.findReportingSessionsForIDs(reporterIDs);
                 for (std::size_t at = 0; at < sessions.size(); ++at) {
-                  // The last one gets the payload itself: it need not be copied to be changed.
-                  ValueMap payload = at + 1 == sessions.size() ? std::move(message) : message;
+                  ValueMap payload = message;
+                  // The last session then holds it alone, and need not copy it to change it.
+                  if (at + 1 == sessions.size()) message = ValueMap();
                   sessions[at]->sendMessage(
                       std::make_shared<TWReportingSessionMessage>(std::move(payload), messageCategory, type));
                 }

@@ -27,8 +27,8 @@ class TWReportingClientServerInstance final
     : public TWReportingServiceProtocol,
       public std::enable_shared_from_this<TWReportingClientServerInstance> {
  public:
-  // Creating one more is refused, and so is a message that names more: a list of identifiers, however often it names
-  // one session, must not turn one frame into a million deliveries.
+  // Creating one more is refused, and so is a message that names more: a list of identifiers, however often
+  // it names one session, must not turn one frame into a million deliveries.
   static constexpr std::size_t kMostSessions = 4096;
 
   using SessionMap = std::map<ReporterID, std::shared_ptr<TWReportingSession>>;

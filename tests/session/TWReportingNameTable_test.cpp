@@ -37,8 +37,12 @@ RC_GTEST_PROP(TWReportingNameTableProperty, GivesEveryCategoryTypeAndServiceItsO
     const std::string s = TWReportingUtilityGenerateServiceNameFromServiceType(nearService);
     RC_ASSERT(table.audioTag(each, nearType).string() == c + t);
     const auto& names = table.eventNames(each, nearType, nearService);
-    RC_ASSERT(names.ofTonewerk.string() == "com.orvane.tonewerk." + c + "." + t);
-    RC_ASSERT(names.ofService.string() == "com.orvane." + s + "." + c + "." + t);
+    std::string ending = ".";
+    ending += c;
+    ending += '.';
+    ending += t;
+    RC_ASSERT(names.ofTonewerk.string() == "com.orvane.tonewerk" + ending);
+    RC_ASSERT(names.ofService.string() == "com.orvane." + s + ending);
   }
 }
 

@@ -30,6 +30,7 @@ constexpr double kYear = 365 * 24 * 3600.0;
 
 std::vector<std::string> namesOf(const std::vector<const TWReportingSessionWorkerClass*>& classes) {
   std::vector<std::string> names;
+  names.reserve(classes.size());
   for (const auto* workerClass : classes) names.emplace_back(workerClass->name);
   return names;
 }

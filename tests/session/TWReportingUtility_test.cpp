@@ -314,6 +314,7 @@ TEST_F(TWReportingUtilityTest, ThereIsOneWorkQueueOfTheHighestPriority) {
 TEST_F(TWReportingUtilityTest, ManyThreadsGetTheSameWorkQueue) {
   std::vector<SerialQueue*> seen(4);
   std::vector<std::thread> threads;
+  threads.reserve(seen.size());
   for (auto& queue : seen) {
     threads.emplace_back([&queue] { queue = &TWReportingUtilityGetReportingServerQueue(); });
   }

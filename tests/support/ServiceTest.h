@@ -16,13 +16,15 @@ namespace tonewerk {
 
 // A service on doubles, with clients that connect in memory. Nothing runs on the work queue until run().
 class ServiceTest : public ReportingTest {
- protected:
-  explicit ServiceTest(Classes workerClasses = {}) : ReportingTest(std::move(workerClasses)) {
-    startService();
-  }
+ public:
   ~ServiceTest() override {
     messaging.shutDown();
     run();
+  }
+
+ protected:
+  explicit ServiceTest(Classes workerClasses = {}) : ReportingTest(std::move(workerClasses)) {
+    startService();
   }
 
   void startService() {

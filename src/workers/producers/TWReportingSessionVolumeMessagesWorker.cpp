@@ -62,7 +62,7 @@ std::string bucketed(double value, std::span<const double> buckets, int fraction
 // One walk over a session's messages.
 class Walk {
  public:
-  Walk(ValueMap previousValues, const SharedString* process, double minimumPlaytime)
+  Walk(const ValueMap& previousValues, const SharedString* process, double minimumPlaytime)
       : process_(process), minimumPlaytime_(minimumPlaytime), state_(defaultState()) {
     state_.merge(previousValues);
     isPlaying_ = state_.boolean(TWReportingMessageKeySessionOutputRunning);

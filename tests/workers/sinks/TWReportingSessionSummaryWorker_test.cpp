@@ -12,8 +12,6 @@ namespace tonewerk {
 namespace {
 
 using ::testing::ElementsAre;
-using ::testing::HasSubstr;
-using ::testing::IsEmpty;
 using ::testing::SizeIs;
 
 class TWReportingSessionSummaryWorkerTest : public ReportingTest {
