@@ -1,0 +1,205 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What one connection may take of the daemon, one below and one above, and what the others notice of it:
+// nothing.
+#include <poll.h>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "platform/linux/RawClient.h"
+#include "platform/linux/RpcLimits.h"
+#include "service/TWReportingClientServerInstance.h"
+#include "system/support/DaemonTest.h"
+#include "system/support/Packed.h"
+#include "system/support/StoreReader.h"
+
+namespace tonewerk {
+namespace {
+
+using packed::integer;
+using ::testing::IsEmpty;
+using ::testing::SizeIs;
+
+constexpr auto kMostSessions = static_cast<ReporterID>(TWReportingClientServerInstance::kMostSessions);
+constexpr ReporterID kFirst = 1000;
+
+// So many that a list of them takes 4.5 KiB; and requests for it whose answers pass every bound many times.
+constexpr ReporterID kSessions = 512;
+constexpr std::uint32_t kFarTooMany = 100'000;
+
+class ConnectionLimitsTest : public DaemonTest {
+ protected:
+  void SetUp() override {
+    daemon.setEnvironment("TONEWERK_LOG", "default");  // what follows would be many lines
+    // What is freed counts as free, also under a sanitizer.
+    daemon.setEnvironment("ASAN_OPTIONS", "quarantine_size_mb=1");
+    ASSERT_TRUE(daemon.start());
+  }
+
+  static void createSessions(DaemonClient& client, ReporterID count) {
+    for (ReporterID at = 0; at < count; ++at) client.request("createReportingSession", {Value(kFirst + at)});
+    EXPECT_TRUE(client.waitForAnswers(static_cast<std::size_t>(count)));
+  }
+
+  static std::int64_t errorCodeOf(const Answer& answer) { return answer.error ? answer.error->code : 0; }
+};
+
+// A client that sends requests with vast answers and reads none.
+class UnreadingClient {
+ public:
+  explicit UnreadingClient(const std::string& path) : client_(path) {}
+
+  // Sends until the daemon has taken nothing for a while; false when it takes everything.
+  bool sendUntilNothingIsTaken(std::uint32_t mostRequests) {
+    while (sent_ < mostRequests) {
+      if (rest_.empty()) rest_ = packed::request(sent_++, "getAllReporters", {});
+      rest_.erase(0, client_.sendWithoutWaiting(rest_));
+      if (!rest_.empty() && !isWritableSoon()) return true;
+    }
+    return false;
+  }
+
+  // Reads every answer, and then sends what is left of the last request.
+  std::uint32_t readAll() {
+    std::uint32_t read = 0;
+    const std::uint32_t whole = rest_.empty() ? sent_ : sent_ - 1;
+    while (read < whole && isNext(read)) ++read;
+    if (read < whole || rest_.empty()) return read;
+    return client_.send(rest_) && isNext(read) ? read + 1 : read;
+  }
+
+  std::uint32_t sent() const { return sent_; }
+
+ private:
+  static constexpr int kStandstillMilliseconds = 500;
+
+  bool isNext(std::uint32_t identifier) {
+    const auto answer = client_.response();
+    return answer && !answer->error && answer->identifier == identifier;
+  }
+  bool isWritableSoon() const {
+    pollfd polled{client_.fileDescriptor(), POLLOUT, 0};
+    return poll(&polled, 1, kStandstillMilliseconds) == 1;
+  }
+
+  RawClient client_;
+  std::uint32_t sent_ = 0;
+  std::string rest_;  // of the last request
+};
+
+TEST_F(ConnectionLimitsTest, AConnectionHoldsSoManySessionsAndNotOneMore) {
+  DaemonClient client = connect();
+  createSessions(client, kMostSessions);
+  const Answer refusal = client.call("createReportingSession", {Value(kFirst + kMostSessions)});
+  EXPECT_EQ(errorCodeOf(refusal), 3);
+  EXPECT_EQ(refusal.error.value_or(ReplyError()).domain, "com.orvane.tonewerk.messaging");
+  EXPECT_THAT(client.allReporters(), SizeIs(kMostSessions));
+
+  client.create(kFirst);  // replaces one
+  DaemonClient other = connect();
+  other.create(kFirst + kMostSessions);  // the bound is each connection's own
+  client.destroy(kFirst);
+  client.create(kFirst + kMostSessions);
+  EXPECT_EQ(errorCodeOf(client.call("createReportingSession", {Value(kFirst)})), 3);
+
+  client.disconnect();
+  EXPECT_TRUE(waitUntil([&] { return other.allReporters() == std::vector{kFirst + kMostSessions}; }));
+}
+
+TEST_F(ConnectionLimitsTest, AMessageNamesSoManySessionsAndNotOneMore) {
+  DaemonClient client = connect();
+  client.create(kFirst, 7);
+  const std::vector<ReporterID> most(TWReportingClientServerInstance::kMostSessions, kFirst);
+  std::vector<ReporterID> oneMore = most;
+  oneMore.push_back(kFirst);
+  client.send({{"a", 1}}, 1, 0, most);
+  EXPECT_EQ(
+      errorCodeOf(client.call("sendMessage", ReportingClient::messageArguments({{"a", 1}}, 1, 0, oneMore))),
+      3);
+}
+
+TEST_F(ConnectionLimitsTest, ManyMoreRequestsThanMayBeUnderWayAreAllAnsweredInOrder) {
+  constexpr std::uint32_t kRequests = 8 * kMostUnfinishedRequests;
+  std::string all;
+  for (std::uint32_t at = 0; at < kRequests; ++at) {
+    all += packed::request(at, "getServiceNameForReporterID", {integer(5)});
+  }
+  RawClient client(daemon.socketPath());
+  ASSERT_TRUE(client.send(all));
+  for (std::uint32_t at = 0; at < kRequests; ++at) {
+    const auto answer = client.response();
+    ASSERT_TRUE(answer);
+    ASSERT_EQ(answer->identifier, at);
+    ASSERT_EQ(answer->result, Value(65'535));
+  }
+}
+
+TEST_F(ConnectionLimitsTest, AClientThatReadsNothingIsNotReadFromUntilItReadsAndLosesNothing) {
+  DaemonClient holder = connect();
+  createSessions(holder, kSessions);
+  UnreadingClient unreading(daemon.socketPath());
+  ASSERT_TRUE(unreading.sendUntilNothingIsTaken(kFarTooMany));
+  // The others are served as ever.
+  EXPECT_THAT(holder.allReporters(), SizeIs(kSessions));
+  DaemonClient newcomer = connect();
+  newcomer.create(5, 7);
+  EXPECT_EQ(newcomer.serviceType(5), 7);
+  newcomer.destroy(5);
+
+  EXPECT_EQ(unreading.readAll(), unreading.sent());
+  EXPECT_THAT(holder.allReporters(), SizeIs(kSessions));
+}
+
+TEST_F(ConnectionLimitsTest, ClientsThatNeverReadEndWithoutHarmToOthers) {
+  DaemonClient holder = connect();
+  createSessions(holder, kSessions);
+  const std::size_t before = daemon.residentBytes();
+  std::vector<std::unique_ptr<UnreadingClient>> unreading;
+  for (int at = 0; at < 4; ++at) {
+    unreading.push_back(std::make_unique<UnreadingClient>(daemon.socketPath()));
+    ASSERT_TRUE(unreading.back()->sendUntilNothingIsTaken(kFarTooMany));
+  }
+  EXPECT_THAT(holder.allReporters(), SizeIs(kSessions));
+  // 4 MiB of answers each, and what growing to that leaves behind.
+  EXPECT_LT(daemon.residentBytes(), before + unreading.size() * 32 * 1024 * 1024);
+  unreading.clear();
+  EXPECT_THAT(holder.allReporters(), SizeIs(kSessions));
+}
+
+TEST_F(ConnectionLimitsTest, ConnectionsThatComeAndGoLeaveNothingBehind) {
+  DaemonClient bystander = connect();
+  bystander.create(1, 7);
+  bystander.start(1);
+  // Once it has recorded that somebody came and went, it has its own files open.
+  { DaemonClient(daemon.socketPath()).create(2); }
+  ASSERT_TRUE(waitUntil([&] { return !StoreReader(daemon.storePath()).eventNames().empty(); }));
+  const std::size_t atRest = daemon.openDescriptors();
+
+  constexpr int kThreads = 4;
+  constexpr int kEach = 100;
+  std::vector<std::thread> threads;
+  for (int thread = 0; thread < kThreads; ++thread) {
+    threads.emplace_back([this, thread] {
+      for (int at = 0; at < kEach; ++at) {
+        const ReporterID reporterID = kFirst + thread * kEach + at;
+        RawClient client(daemon.socketPath());
+        std::string bytes = packed::request(1, "createReportingSession", {integer(reporterID)}) +
+                            packed::request(2, "startReportingSessionForID", {integer(reporterID)}) +
+                            packed::request(3, "getAllReporters", {});
+        if (at % 3 == 1) bytes.resize(bytes.size() / 2);
+        client.send(bytes);
+        if (at % 3 == 2) static_cast<void>(client.response());
+      }
+    });
+  }
+  for (std::thread& thread : threads) thread.join();
+
+  EXPECT_TRUE(waitUntil([&] { return bystander.allReporters() == std::vector<ReporterID>{1}; }));
+  EXPECT_TRUE(waitUntil([&] { return daemon.openDescriptors() <= atRest; }))
+      << daemon.openDescriptors() << " descriptors, " << atRest << " at rest";
+  EXPECT_THAT(bystander.answered(), IsEmpty());
+}
+
+}  // namespace
+}  // namespace tonewerk
