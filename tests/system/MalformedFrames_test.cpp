@@ -159,7 +159,7 @@ class MalformedFramesTest : public RunningDaemonTest {
     ASSERT_TRUE(waitUntil([&] { return errorLines() == before + 1; })) << daemon.log();
   }
 
-  std::size_t errorLines() const { return logLinesWith(" and is ended"); }
+  std::size_t errorLines() const { return logLinesWith(" and is ended", " error twrs "); }
 
   std::unique_ptr<DaemonClient> bystander;
 };

@@ -12,11 +12,11 @@ void DaemonTest::TearDown() {
   expectNoSanitizerReport(daemon.log());
 }
 
-std::size_t DaemonTest::logLinesWith(const std::string& text) const {
+std::size_t DaemonTest::logLinesWith(const std::string& text, const std::string& other) const {
   std::istringstream lines(daemon.log());
   std::size_t count = 0;
   for (std::string line; std::getline(lines, line);) {
-    if (line.find(text) != std::string::npos) ++count;
+    if (line.find(text) != std::string::npos && line.find(other) != std::string::npos) ++count;
   }
   return count;
 }

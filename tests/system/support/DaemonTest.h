@@ -20,8 +20,8 @@ class DaemonTest : public ::testing::Test {
   // A client that is connected, or a test failure.
   DaemonClient connect() { return DaemonClient(daemon.socketPath()); }
 
-  // How many lines the daemon has written that hold `text`.
-  std::size_t logLinesWith(const std::string& text) const;
+  // How many lines the daemon has written that hold both texts.
+  std::size_t logLinesWith(const std::string& text, const std::string& other = {}) const;
   bool waitForLogLine(const std::string& text) const;
 
   DaemonProcess daemon;

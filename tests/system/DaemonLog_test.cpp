@@ -1,0 +1,92 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What the daemon writes to standard error.
+#include <regex>
+#include <set>
+#include <sstream>
+#include <string>
+
+#include "system/support/DaemonTest.h"
+
+namespace tonewerk {
+namespace {
+
+using ::testing::Contains;
+using ::testing::IsSubsetOf;
+using ::testing::IsSupersetOf;
+using ::testing::Not;
+
+class DaemonLogTest : public DaemonTest {
+ protected:
+  // Starts it, has a client come and go, and stops it.
+  void runWith(const std::string& threshold) {
+    daemon.setEnvironment("TONEWERK_LOG", threshold);
+    ASSERT_TRUE(daemon.start());
+    {
+      DaemonClient client = connect();
+      client.create(77, 7);
+      client.start(77);
+      client.call("reporterIDValid", {Value(77)});
+      client.stop(77);
+    }
+    EXPECT_EQ(daemon.stop(), 0);
+  }
+
+  std::set<std::string> levels() const {
+    std::set<std::string> found;
+    std::istringstream lines(daemon.log());
+    for (std::string line; std::getline(lines, line);) {
+      std::smatch parts;
+      if (std::regex_match(line, parts, kLine)) found.insert(parts[1]);
+    }
+    return found;
+  }
+
+  static inline const std::regex kLine{
+      R"(\d{4}-\d\d-\d\dT\d\d:\d\d:\d\d\.\d{6}Z (debug|info|default|error) (tw\w{2}) +\S+:\d+ +(.*))"};
+};
+
+TEST_F(DaemonLogTest, EveryLineHasTimeLevelCategoryAndPlace) {
+  runWith("debug");
+  std::istringstream lines(daemon.log());
+  std::size_t count = 0;
+  for (std::string line; std::getline(lines, line); ++count) {
+    EXPECT_TRUE(std::regex_match(line, kLine)) << line;
+  }
+  EXPECT_GT(count, 20U);
+}
+
+TEST_F(DaemonLogTest, TheThresholdIsChosenByTheVariable) {
+  runWith("info");
+  EXPECT_THAT(levels(), IsSupersetOf({"info", "default"}));
+  EXPECT_THAT(levels(), Not(Contains("debug")));
+}
+
+TEST_F(DaemonLogTest, NothingBelowDefaultIsWrittenUnlessAskedFor) {
+  runWith("");
+  EXPECT_THAT(levels(), Contains("default"));
+  EXPECT_THAT(levels(), Not(Contains("info")));
+  EXPECT_THAT(levels(), Not(Contains("debug")));
+}
+
+TEST_F(DaemonLogTest, ErrorsAloneAreWrittenWhenAskedFor) {
+  runWith("error");
+  EXPECT_THAT(levels(), IsSubsetOf({"error"}));
+}
+
+TEST_F(DaemonLogTest, OneCategoryCanBeWatchedAlone) {
+  runWith("twrr=debug,error");
+  EXPECT_GT(logLinesWith("Z debug twrr "), 0U);
+  EXPECT_EQ(logLinesWith("Z debug twrs "), 0U);
+  EXPECT_EQ(logLinesWith("Z info twrs "), 0U);
+}
+
+TEST_F(DaemonLogTest, AThresholdThatIsNoneIsSaidAndNotUsed) {
+  runWith("loud");
+  EXPECT_EQ(logLinesWith("TONEWERK_LOG is not understood"), 1U);
+  EXPECT_GT(logLinesWith(" default twrs "), 0U);
+  EXPECT_EQ(logLinesWith(" info "), 0U);
+}
+
+}  // namespace
+}  // namespace tonewerk
