@@ -87,6 +87,7 @@ TEST_F(CommandLineTest, CallsWrongUsageWrong) {
            {"list", "more"},
            {"validate"},
            {"validate", "seven"},
+           {"validate", "9223372036854775808"},
            {"send", "--type", "Start", "a=1"},
            {"send", "--category", "Playback", "--type", "Start"},
            {"send", "--category", "Nonsense", "--type", "Start", "a=1"},

@@ -54,5 +54,15 @@ TEST(ValueArgumentsTest, KnowsTypes) {
   for (const char* text : {"", "start", "65536", "-1", "1.0"}) EXPECT_FALSE(typeOfArgument(text)) << text;
 }
 
+// One above the largest was taken for the largest, and somebody else's session answered for.
+TEST(ValueArgumentsTest, RefusesAnIdentifierOutOfRange) {
+  for (const char* good : {"0", "7", "-1", "9223372036854775807", "-9223372036854775808"}) {
+    EXPECT_EQ(problemWithReporterID(good), "");
+  }
+  for (const char* bad : {"9223372036854775808", "-9223372036854775809", "", "seven", "7.0", "7 ", "0x7"}) {
+    EXPECT_NE(problemWithReporterID(bad), "") << bad;
+  }
+}
+
 }  // namespace
 }  // namespace tonewerk

@@ -72,6 +72,7 @@ void addSendCommand(CLI::App& app, Tool& tool) {
   command
       .add_option("--id", options->reporterIDs, "A session's identifier; without any, every started session")
       ->allow_extra_args(false)
+      ->check(problemWithReporterID)
       ->take_all();
   command.add_option("--category", options->category, "Its name, as Playback or HAL_Playback, or number")
       ->required();

@@ -7,6 +7,7 @@
 #include "tools/twctl/Commands.h"
 #include "tools/twctl/Daemon.h"
 #include "tools/twctl/SessionTable.h"
+#include "tools/twctl/ValueArguments.h"
 
 namespace tonewerk {
 namespace {
@@ -30,7 +31,7 @@ void validate(Tool& tool, ReporterID reporterID) {
 void addValidateCommand(CLI::App& app, Tool& tool) {
   CLI::App& command = addCommand(app, tool, "validate", "Whether a session has this identifier");
   const auto reporterID = std::make_shared<ReporterID>(0);
-  command.add_option("ID", *reporterID, "The session's identifier")->required();
+  command.add_option("ID", *reporterID, "The session's identifier")->required()->check(problemWithReporterID);
   command.callback([&tool, reporterID] { validate(tool, *reporterID); });
 }
 

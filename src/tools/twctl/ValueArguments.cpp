@@ -76,4 +76,11 @@ std::optional<AudioEventType> typeOfArgument(std::string_view text) {
   return std::nullopt;
 }
 
+std::string problemWithReporterID(const std::string& text) {
+  ReporterID reporterID = 0;
+  const char* end = text.data() + text.size();
+  const auto [rest, error] = std::from_chars(text.data(), end, reporterID);
+  return error == std::errc() && rest == end ? "" : "\"" + text + "\" is no signed 64-bit number";
+}
+
 }  // namespace tonewerk

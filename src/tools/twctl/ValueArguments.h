@@ -24,4 +24,9 @@ std::optional<AudioEventCategory> categoryOfArgument(std::string_view text);
 // "Start", "Unknown" or a number; none for anything else.
 std::optional<AudioEventType> typeOfArgument(std::string_view text);
 
+// What is wrong with a session's identifier; empty when it is a decimal number of 64 bits with a sign. For
+// options that are read into a ReporterID: their own reading takes a number that is too large for the largest
+// there is.
+std::string problemWithReporterID(const std::string& text);
+
 }  // namespace tonewerk
