@@ -12,7 +12,7 @@
 #include "service/TWReportingClientServerInstance.h"
 #include "system/support/DaemonTest.h"
 #include "system/support/Packed.h"
-#include "system/support/StoreReader.h"
+#include "system/support/RecordedEvents.h"
 
 namespace tonewerk {
 namespace {
@@ -173,7 +173,7 @@ TEST_F(ConnectionLimitsTest, ConnectionsThatComeAndGoLeaveNothingBehind) {
   bystander.start(1);
   // Once it has recorded that somebody came and went, it has its own files open.
   { DaemonClient(daemon.socketPath()).create(2); }
-  ASSERT_TRUE(waitUntil([&] { return !StoreReader(daemon.storePath()).eventNames().empty(); }));
+  ASSERT_TRUE(waitUntil([&] { return !RecordedEvents(daemon.storePath()).names().empty(); }));
   const std::size_t atRest = daemon.openDescriptors();
 
   constexpr int kThreads = 4;

@@ -8,7 +8,7 @@
 #include <vector>
 
 #include "system/support/DaemonTest.h"
-#include "system/support/StoreReader.h"
+#include "system/support/RecordedEvents.h"
 
 namespace tonewerk {
 namespace {
@@ -28,7 +28,7 @@ const std::string kSingleMessage = "com.orvane.standalone.Playback.Start";
 class DaemonEndTest : public RunningDaemonTest {
  protected:
   std::vector<nlohmann::json> events(const std::string& name) const {
-    return StoreReader(daemon.storePath()).events(name);
+    return RecordedEvents(daemon.storePath()).named(name);
   }
 
   // A started session that has got a message.
@@ -43,7 +43,7 @@ class DaemonEndTest : public RunningDaemonTest {
     return daemon.process().wait();
   }
 
-  void expectSoundStore() { EXPECT_EQ(StoreReader(daemon.storePath()).integrity(), "ok"); }
+  void expectSoundStore() { EXPECT_EQ(RecordedEvents(daemon.storePath()).integrity(), "ok"); }
 };
 
 class DaemonEndBySignalTest : public DaemonEndTest, public ::testing::WithParamInterface<int> {};

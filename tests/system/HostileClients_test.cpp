@@ -12,7 +12,7 @@
 #include "service/TWReportingServiceExport.h"
 #include "system/support/DaemonTest.h"
 #include "system/support/Packed.h"
-#include "system/support/StoreReader.h"
+#include "system/support/RecordedEvents.h"
 
 namespace tonewerk {
 namespace {
@@ -193,9 +193,9 @@ TEST_F(HostileClientsTest, AWellBehavedClientGetsItsResultsThroughout) {
 
   EXPECT_TRUE(waitUntil([&] { return client.allReporters() == std::vector{kSession}; }));
   EXPECT_EQ(daemon.stop(), 0);
-  const StoreReader store(daemon.storePath());
-  EXPECT_EQ(store.integrity(), "ok");
-  const auto recorded = store.events("com.orvane.longformaudio.HearingHealth.AudioExposure");
+  const RecordedEvents events(daemon.storePath());
+  EXPECT_EQ(events.integrity(), "ok");
+  const auto recorded = events.named("com.orvane.longformaudio.HearingHealth.AudioExposure");
   ASSERT_THAT(recorded, SizeIs(rounds));
   for (std::size_t at = 0; at < rounds; ++at) EXPECT_EQ(recorded[at].at("round"), at);
 }

@@ -8,7 +8,7 @@
 #include <vector>
 
 #include "system/support/DaemonTest.h"
-#include "system/support/StoreReader.h"
+#include "system/support/RecordedEvents.h"
 
 namespace tonewerk {
 namespace {
@@ -31,10 +31,10 @@ double now() {
 
 class ReportsTest : public RunningDaemonTest {
  protected:
-  StoreReader store() const { return StoreReader(daemon.storePath()); }
+  RecordedEvents recorded() const { return RecordedEvents(daemon.storePath()); }
 
   bool waitForEvents(const std::string& name, std::size_t count) const {
-    return waitUntil([&] { return store().events(name).size() >= count; });
+    return waitUntil([&] { return recorded().named(name).size() >= count; });
   }
 
   // The paths of all summary files.
@@ -93,7 +93,7 @@ TEST_F(ReportsTest, AMessageIsRecordedUnderBothItsNamesWithItsPayload) {
   for (const char* name : {"com.orvane.tonewerk.Playback.Start", "com.orvane.longformaudio.Playback.Start"}) {
     SCOPED_TRACE(name);
     ASSERT_TRUE(waitForEvents(name, 1));
-    const json payload = store().events(name).at(0);
+    const json payload = recorded().named(name).at(0);
     EXPECT_EQ(payload.at("truth"), true);
     EXPECT_EQ(payload.at("whole"), -5);
     EXPECT_EQ(payload.at("large"), UINT64_MAX);
@@ -118,7 +118,7 @@ TEST_F(ReportsTest, AScriptedPlaybackBecomesVolumeSummariesWithItsFigures) {
   for (const char* name : {"com.orvane.tonewerk.Volume.Summary", "com.orvane.longformaudio.Volume.Summary"}) {
     SCOPED_TRACE(name);
     ASSERT_TRUE(waitForEvents(name, 2));
-    const std::vector<json> summaries = store().events(name);
+    const std::vector<json> summaries = recorded().named(name);
     ASSERT_THAT(summaries, SizeIs(2));
     EXPECT_EQ(summaries[0].at("play_seconds"), 10.0);
     EXPECT_EQ(summaries[0].at("QMSessionVolume"), 0.25);
@@ -146,8 +146,8 @@ TEST_F(ReportsTest, ASessionsEndIsSummedUp) {
   client.send({{"issue_type", "overload"}}, 1, kTypeGeneric, {kSession});
   client.stop(kSession);
   const char* name = "com.orvane.tonewerk.Session_Generic.Summary";
-  ASSERT_TRUE(waitForEvents(name, 1)) << ::testing::PrintToString(store().eventNames());
-  const json summary = store().events(name).at(0);
+  ASSERT_TRUE(waitForEvents(name, 1)) << ::testing::PrintToString(recorded().names());
+  const json summary = recorded().named(name).at(0);
   EXPECT_EQ(summary.at("total_active_time"), 12.5);
   EXPECT_EQ(summary.at("active_count"), 1);
   EXPECT_EQ(summary.at("overload_count"), 1);
@@ -167,14 +167,16 @@ TEST_F(ReportsTest, ASummaryNamesTheClientsProcessUnlessTheServiceTypeWasChanged
   client.start(5);
   client.stop(5);
   ASSERT_TRUE(waitForEvents("com.orvane.longformaudio.Session_Generic.Summary", 1));
-  const std::vector<json> named = store().events("com.orvane.unknown.Session_Generic.Summary");
+  const std::vector<json> named = recorded().named("com.orvane.unknown.Session_Generic.Summary");
   ASSERT_THAT(named, SizeIs(1));
   std::ifstream comm("/proc/self/comm");
   std::string ownName;
   std::getline(comm, ownName);
   EXPECT_EQ(named.at(0).at("clientProcessName"), ownName);
-  EXPECT_FALSE(
-      store().events("com.orvane.longformaudio.Session_Generic.Summary").at(0).contains("clientProcessName"));
+  EXPECT_FALSE(recorded()
+                   .named("com.orvane.longformaudio.Session_Generic.Summary")
+                   .at(0)
+                   .contains("clientProcessName"));
 }
 
 TEST_F(ReportsTest, AMessageWithoutIdentifiersGoesToEveryStartedSessionOfEveryClient) {
@@ -187,8 +189,8 @@ TEST_F(ReportsTest, AMessageWithoutIdentifiersGoesToEveryStartedSessionOfEveryCl
   second.create(6, 2);
   second.send({{"to", "all"}}, kPlayback, kActivate, {});
   ASSERT_TRUE(waitForEvents("com.orvane.haptics.Playback.Activate", 1));
-  EXPECT_THAT(store().events("com.orvane.longformaudio.Playback.Activate"), SizeIs(1));
-  EXPECT_THAT(store().events("com.orvane.telephony.Playback.Activate"), IsEmpty());
+  EXPECT_THAT(recorded().named("com.orvane.longformaudio.Playback.Activate"), SizeIs(1));
+  EXPECT_THAT(recorded().named("com.orvane.telephony.Playback.Activate"), IsEmpty());
   EXPECT_EQ(logLinesWith("Creating singleMessageSession"), 0U);
 }
 
@@ -199,7 +201,8 @@ TEST_F(ReportsTest, AMessageWithoutAnySessionMakesOneThatIsStoppedAfterFiveQuiet
   ASSERT_TRUE(waitForEvents("com.orvane.standalone.Playback.Activate", 2));
   EXPECT_EQ(logLinesWith("Creating singleMessageSession"), 1U);
   EXPECT_THAT(client.allReporters(), IsEmpty());
-  EXPECT_FALSE(store().events("com.orvane.standalone.Playback.Activate").at(0).contains("sendSingleMessage"));
+  EXPECT_FALSE(
+      recorded().named("com.orvane.standalone.Playback.Activate").at(0).contains("sendSingleMessage"));
   EXPECT_TRUE(waitForLogLine("Stopping singleMessageSession after timeout=5"));
 }
 
@@ -214,7 +217,7 @@ TEST_F(ReportsTest, AClientThatGoesIsReportedWithItsSessions) {
   EXPECT_TRUE(waitForEvents("com.orvane.longformaudio.Session_Generic.Summary", 1));
   const char* uptime = "com.orvane.tonewerk.twreportingclientuptime";
   ASSERT_TRUE(waitForEvents(uptime, 1));
-  for (const json& event : store().events(uptime)) {
+  for (const json& event : recorded().named(uptime)) {
     EXPECT_TRUE(event.at("processName").is_string());
     EXPECT_GE(event.at("seconds").get<double>(), 0.0);
   }
@@ -232,8 +235,8 @@ TEST_F(ReportsTest, OnlyEventsThatSomebodyAskedForAreRecorded) {
   play(client, kSession);
   client.stop(kSession);
   EXPECT_EQ(daemon.stop(), 0);
-  EXPECT_THAT(store().events("com.orvane.longformaudio.Volume.Summary"), SizeIs(2));
-  EXPECT_THAT(store().events("com.orvane.longformaudio.Playback.Start"), IsEmpty());
+  EXPECT_THAT(recorded().named("com.orvane.longformaudio.Volume.Summary"), SizeIs(2));
+  EXPECT_THAT(recorded().named("com.orvane.longformaudio.Playback.Start"), IsEmpty());
 }
 
 TEST_F(ReportsTest, ASummaryFileIsWrittenForATestSessionAlone) {
@@ -295,9 +298,10 @@ TEST_F(InternalBuildReportsTest, AMessageWithoutIdentifiersIsMarked) {
   client.send({{"to", "all"}}, kPlayback, kActivate, {});
   client.send({{"to", "one"}}, kPlayback, kDeactivate, {kSession});
   ASSERT_TRUE(waitForEvents("com.orvane.longformaudio.Playback.Deactivate", 1));
-  EXPECT_EQ(store().events("com.orvane.longformaudio.Playback.Activate").at(0).at("sendSingleMessage"), true);
+  EXPECT_EQ(recorded().named("com.orvane.longformaudio.Playback.Activate").at(0).at("sendSingleMessage"),
+            true);
   EXPECT_FALSE(
-      store().events("com.orvane.longformaudio.Playback.Deactivate").at(0).contains("sendSingleMessage"));
+      recorded().named("com.orvane.longformaudio.Playback.Deactivate").at(0).contains("sendSingleMessage"));
 }
 
 TEST_F(InternalBuildReportsTest, NamesThatLeaveTheDirectoryMakeNoFile) {

@@ -8,7 +8,7 @@
 #include <sys/mount.h>
 
 #include "system/support/DaemonTest.h"
-#include "system/support/StoreReader.h"
+#include "system/support/RecordedEvents.h"
 
 namespace tonewerk {
 namespace {
@@ -24,7 +24,7 @@ class UnwritableStoreTest : public DaemonTest {
     client.start(kSession);
     reportOne(client);
   }
-  std::size_t recorded() const { return StoreReader(daemon.storePath()).events(kEvent).size(); }
+  std::size_t recorded() const { return RecordedEvents(daemon.storePath()).named(kEvent).size(); }
   std::size_t failures() const { return logLinesWith("cannot write " + daemon.storePath()); }
   std::size_t resumptions() const { return logLinesWith("writing to " + daemon.storePath() + " goes on"); }
 
@@ -126,7 +126,7 @@ TEST_F(UnwritableStoreTest, AFullDiskCostsNothingOnceThereIsRoomAgain) {
   ASSERT_TRUE(disk.grow());
   EXPECT_TRUE(waitUntil([&] { return recorded() == reported; }));
   EXPECT_EQ(failures(), 1U);
-  EXPECT_EQ(StoreReader(daemon.storePath()).integrity(), "ok");
+  EXPECT_EQ(RecordedEvents(daemon.storePath()).integrity(), "ok");
   client.disconnect();
   EXPECT_EQ(daemon.stop(), 0);
 }

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "system/support/StoreReader.h"
+#include "system/support/RecordedEvents.h"
 
 #include <chrono>
 #include <memory>
@@ -19,7 +19,7 @@ struct Close {
 
 }  // namespace
 
-std::vector<nlohmann::json> StoreReader::events(const std::string& name) const {
+std::vector<nlohmann::json> RecordedEvents::named(const std::string& name) const {
   std::vector<nlohmann::json> found;
   for (const std::string& text :
        texts("SELECT payload FROM analytics_event WHERE name = ? ORDER BY id", name)) {
@@ -28,18 +28,18 @@ std::vector<nlohmann::json> StoreReader::events(const std::string& name) const {
   return found;
 }
 
-std::vector<std::string> StoreReader::eventNames() const {
+std::vector<std::string> RecordedEvents::names() const {
   return texts("SELECT name FROM analytics_event ORDER BY id");
 }
 
-std::string StoreReader::integrity() const {
+std::string RecordedEvents::integrity() const {
   std::string all;
   for (const std::string& line : texts("PRAGMA integrity_check")) all += all.empty() ? line : "\n" + line;
   return all;
 }
 
-std::vector<std::string> StoreReader::texts(const std::string& query,
-                                            const std::optional<std::string>& argument) const {
+std::vector<std::string> RecordedEvents::texts(const std::string& query,
+                                               const std::optional<std::string>& argument) const {
   sqlite3* opened = nullptr;
   const int result = sqlite3_open_v2(path_.c_str(), &opened, SQLITE_OPEN_READONLY, nullptr);
   const std::unique_ptr<sqlite3, Close> database(opened);

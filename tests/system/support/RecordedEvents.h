@@ -9,14 +9,14 @@
 namespace tonewerk {
 
 // What anybody can read out of the daemon's store, also while the daemon writes.
-class StoreReader {
+class RecordedEvents {
  public:
-  explicit StoreReader(std::string path) : path_(std::move(path)) {}
+  explicit RecordedEvents(std::string path) : path_(std::move(path)) {}
 
   // The payloads of all events of this name, oldest first; none without a readable store.
-  std::vector<nlohmann::json> events(const std::string& name) const;
+  std::vector<nlohmann::json> named(const std::string& name) const;
   // The names of all events, oldest first.
-  std::vector<std::string> eventNames() const;
+  std::vector<std::string> names() const;
   // What the database itself finds wrong with it; "ok" when nothing is.
   std::string integrity() const;
 
