@@ -176,12 +176,13 @@ TEST_F(ConnectionLimitsTest, ConnectionsThatComeAndGoLeaveNothingBehind) {
   ASSERT_TRUE(waitUntil([&] { return !RecordedEvents(daemon.storePath()).names().empty(); }));
   const std::size_t atRest = daemon.openDescriptors();
 
-  constexpr int kThreads = 4;
-  constexpr int kEach = 100;
+  constexpr ReporterID kThreads = 4;
+  constexpr ReporterID kEach = 100;
   std::vector<std::thread> threads;
-  for (int thread = 0; thread < kThreads; ++thread) {
+  threads.reserve(kThreads);
+  for (ReporterID thread = 0; thread < kThreads; ++thread) {
     threads.emplace_back([this, thread] {
-      for (int at = 0; at < kEach; ++at) {
+      for (ReporterID at = 0; at < kEach; ++at) {
         const ReporterID reporterID = kFirst + thread * kEach + at;
         RawClient client(daemon.socketPath());
         std::string bytes = packed::request(1, "createReportingSession", {integer(reporterID)}) +

@@ -165,6 +165,7 @@ TEST_F(HostileClientsTest, AWellBehavedClientGetsItsResultsThroughout) {
   ASSERT_TRUE(daemon.start());
   std::atomic<unsigned> attacking = kClients;
   std::vector<std::thread> attackers;
+  attackers.reserve(kClients);
   for (unsigned seed = 1; seed <= kClients; ++seed) {
     attackers.emplace_back([this, seed, &attacking] {
       attack(seed);

@@ -3,6 +3,7 @@
 // A store that cannot be written: the daemon serves on, says so once, and goes on writing when it can.
 #include <filesystem>
 #include <fstream>
+#include <sched.h>
 #include <sqlite3.h>
 #include <string>
 #include <sys/mount.h>
@@ -90,11 +91,14 @@ TEST_F(UnwritableStoreTest, SomebodyElsesWriteLockIsWaitedFor) {
   EXPECT_EQ(failures(), 1U);
 }
 
-// A file system of its own, with little room.
+// A file system with little room that this process and its children alone see, so that nothing of it is left
+// whatever becomes of the test.
 class SmallFileSystem {
  public:
   explicit SmallFileSystem(std::string path) : path_(std::move(path)) {
-    isMounted_ = ::mount("tonewerk-test", path_.c_str(), "tmpfs", 0, "size=1m") == 0;
+    isMounted_ = ::unshare(CLONE_NEWNS) == 0 &&
+                 ::mount("none", "/", nullptr, MS_REC | MS_PRIVATE, nullptr) == 0 &&
+                 ::mount("tonewerk-test", path_.c_str(), "tmpfs", 0, "size=1m") == 0;
   }
   SmallFileSystem(const SmallFileSystem&) = delete;
   SmallFileSystem& operator=(const SmallFileSystem&) = delete;
