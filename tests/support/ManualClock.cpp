@@ -15,6 +15,7 @@ double secondsOf(std::chrono::nanoseconds duration) {
 
 double ManualClock::now() const {
   const std::lock_guard lock(mutex_);
+  ++wallReads_;
   return wallAtZero_ + secondsOf(monotonic_);
 }
 
@@ -51,6 +52,11 @@ void ManualClock::setNow(double seconds) {
 void ManualClock::setUtcOffset(std::chrono::minutes offset) {
   const std::lock_guard lock(mutex_);
   utcOffset_ = offset;
+}
+
+std::uint64_t ManualClock::wallReads() const {
+  const std::lock_guard lock(mutex_);
+  return wallReads_;
 }
 
 void ManualClock::addAlarm(Alarm& alarm) { alarms_.push_back(&alarm); }

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <chrono>
+#include <cstdint>
 #include <mutex>
 #include <optional>
 #include <vector>
@@ -43,6 +44,9 @@ class ManualClock final : public Clock {
   void setNow(double seconds);
   void setUtcOffset(std::chrono::minutes offset);
 
+  // How often now() was asked.
+  std::uint64_t wallReads() const;
+
   // `alarm` is removed before it dies.
   void addAlarm(Alarm& alarm);
   void removeAlarm(Alarm& alarm);
@@ -51,8 +55,9 @@ class ManualClock final : public Clock {
   Alarm* earliestUntil(std::chrono::nanoseconds end) const;
   void moveTo(std::chrono::nanoseconds monotonic);
 
-  mutable std::mutex mutex_;  // guards the three times
-  double wallAtZero_;         // wall-clock time when monotonic time was 0
+  mutable std::mutex mutex_;  // guards the three times and the count
+  mutable std::uint64_t wallReads_ = 0;
+  double wallAtZero_;  // wall-clock time when monotonic time was 0
   std::chrono::nanoseconds monotonic_{0};
   std::chrono::minutes utcOffset_{0};
   std::vector<Alarm*> alarms_;

@@ -10,6 +10,7 @@
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionWorkerUtility.h"
 #include "session/TWReportingUtility.h"
+#include "workers/producers/StretchSummaries.h"
 
 namespace tonewerk {
 namespace {
@@ -17,6 +18,7 @@ namespace {
 constexpr std::array<std::string_view, 2> kKeysToCombine{TWReportingMessageKeySpatialAudioAccessoryFeature,
                                                          TWReportingMessageKeySpatializationEnabled};
 constexpr double kMostPauseSeconds = 5.0;
+constexpr StretchSummaries::Words kWords{"createVolumeMessages", "volume", "playingTime"};
 
 ValueMap defaultState() {
   return {{TWReportingMessageKeySelectedFormat, "unknown"},
@@ -27,13 +29,6 @@ ValueMap defaultState() {
           {TWReportingMessageKeyRingerState, false},
           {TWReportingMessageKeyChannelsPerFrame, -1}};
 }
-
-std::optional<Value> valueOf(const ValueMap& map, std::string_view key) {
-  const Value* value = map.find(key);
-  return value == nullptr ? std::nullopt : std::optional<Value>(*value);
-}
-
-const Value* pointerTo(const std::optional<Value>& value) { return value ? &*value : nullptr; }
 
 bool differsAsText(const ValueMap& state, const ValueMap& message, std::string_view key) {
   const Value* before = state.find(key);
@@ -55,26 +50,22 @@ bool contextDiffers(const ValueMap& state, const ValueMap& message) {
          differsAsNumber(state, message, TWReportingMessageKeyVolume);
 }
 
-std::string bucketed(double value, std::span<const double> buckets, int fractionDigits) {
-  return TWReportingUtilityBucketNumberToString(value, buckets, fractionDigits).value_or("");
-}
-
 // One walk over a session's messages.
 class Walk {
  public:
   Walk(const ValueMap& previousValues, const SharedString* process, double minimumPlaytime)
-      : process_(process), minimumPlaytime_(minimumPlaytime), state_(defaultState()) {
+      : process_(process), state_(defaultState()), summaries_(kWords, minimumPlaytime) {
     state_.merge(previousValues);
     isPlaying_ = state_.boolean(TWReportingMessageKeySessionOutputRunning);
     if (!isPlaying_) return;
     // A stretch that the previous values show as open yields no summary by itself: without the key, the first
     // message finds no output running.
-    stretchStart_ = valueOf(state_, TWReportingMessageKeyTWTimestamp);
+    stretchStart_ = StretchSummaries::timestampOf(state_);
     state_.erase(TWReportingMessageKeySessionOutputRunning);
   }
 
   void step(const ValueMap& message) {
-    const std::optional<Value> timestamp = valueOf(message, TWReportingMessageKeyTWTimestamp);
+    const std::optional<Value> timestamp = StretchSummaries::timestampOf(message);
     const bool wasPlaying = state_.boolean(TWReportingMessageKeySessionOutputRunning);
     const bool isLast = message.contains(TWReportingMessageKeySessionDuration);
     bool changed = isLast;
@@ -94,34 +85,15 @@ class Walk {
     state_.merge(message);
   }
 
-  TWReportingSessionMessages finish() {
-    for (const auto& summary : summaries_) {
-      summary->message.set(TWReportingMessageKeyMessageCount, summaries_.size());
-    }
-    return std::move(summaries_);
-  }
+  TWReportingSessionMessages finish() { return summaries_.finish(); }
 
  private:
   void closeStretch(const std::optional<Value>& timestamp) {
-    const double end = numberOf(pointerTo(timestamp));
-    const double begin = numberOf(pointerTo(stretchStart_));
-    const double playingTime = end - begin;
-    debugLog(
-        TWReportingSessionCategory(),
-        "playingTime { func=%s, playingTime=%f, twTimestamp=%@, twTimestamp_double=%f, startTwTimestamp=%@, "
-        "startTwTimestamp_double=%f }",
-        "createVolumeMessages", playingTime, timestamp, end, stretchStart_, begin);
-    const bool isLongEnough = timestamp && stretchStart_ && playingTime > minimumPlaytime_;
-    if (!isLongEnough || process_ == nullptr || !state_.contains(TWReportingMessageKeyVolume)) {
-      debugLog(TWReportingSessionCategory(),
-               "skipped volume message, too short { func=%s, action=skip, count=%lu }",
-               "createVolumeMessages", summaries_.size());
-      return;
+    const auto playingTime = summaries_.measure(TWReportingSessionCategory(), stretchStart_, timestamp);
+    if (!playingTime || process_ == nullptr || !state_.contains(TWReportingMessageKeyVolume)) {
+      return summaries_.skip(TWReportingSessionCategory());
     }
-    summaries_.push_back(
-        std::make_shared<TWReportingSessionMessage>(summaryOf(playingTime), kCategoryVolume, kTypeSummary));
-    debugLog(TWReportingSessionCategory(), "added volume message { func=%s, action=add, count=%lu }",
-             "createVolumeMessages", summaries_.size());
+    summaries_.add(TWReportingSessionCategory(), summaryOf(*playingTime), kCategoryVolume);
   }
 
   // What the closing stretch was played with: the state before the message that closes it.
@@ -134,24 +106,24 @@ class Walk {
             {TWReportingApplicationName, *process_},
             {TWReportingMessageKeyVolume, volume},
             {TWReportingMessageKeyVolumeBucketed,
-             bucketed(volume.number(), TWReportingUtilityBucketNumberToStringVolumes, 4)},
-            {TWReportingMessageKeyPlayseconds, static_cast<double>(static_cast<float>(playingTime))},
+             TWReportingUtilityBucketNumberToString(volume.number(),
+                                                    TWReportingUtilityBucketNumberToStringVolumes, 4)
+                 .value_or("")},
+            {TWReportingMessageKeyPlayseconds, StretchSummaries::seconds(playingTime)},
             {TWReportingMessageKeySpatialAudioAccessoryFeature,
              carried(TWReportingMessageKeySpatialAudioAccessoryFeature)},
             {TWReportingMessageKeySpatializationEnabled, carried(TWReportingMessageKeySpatializationEnabled)},
             {TWReportingMessageKeyRingerState, carried(TWReportingMessageKeyRingerState)},
             {TWReportingMessageKeyChannelsPerFrame, carried(TWReportingMessageKeyChannelsPerFrame)},
-            {TWReportingMessageKeyPlaysecondsBucketed,
-             bucketed(playingTime, TWReportingUtilityBucketNumberToStringTimes, 0)},
-            {TWReportingMessageKeyMessageIndex, summaries_.size() + 1}};
+            {TWReportingMessageKeyPlaysecondsBucketed, StretchSummaries::bucketedSeconds(playingTime)},
+            {TWReportingMessageKeyMessageIndex, summaries_.nextIndex()}};
   }
 
   const SharedString* process_;
-  const double minimumPlaytime_;
   ValueMap state_;  // the latest value of every key
   bool isPlaying_ = false;
   std::optional<Value> stretchStart_;
-  TWReportingSessionMessages summaries_;
+  StretchSummaries summaries_;
 };
 
 }  // namespace

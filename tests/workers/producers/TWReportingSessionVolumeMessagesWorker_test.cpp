@@ -1,13 +1,16 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "workers/producers/TWReportingSessionVolumeMessagesWorker.h"
 
+#include <array>
 #include <cmath>
 #include <gtest/gtest.h>
 #include <rapidcheck/gtest.h>
 #include <string>
+#include <string_view>
 #include <vector>
 
-#include "support/ReportingTest.h"
+#include "session/TWReportingSessionWorkerUtility.h"
+#include "workers/producers/ProducerTest.h"
 #include "workers/sinks/TWReportingSessionMetriconWorker.h"
 
 namespace tonewerk {
@@ -18,28 +21,11 @@ using ::testing::IsEmpty;
 using ::testing::SizeIs;
 using ::testing::StartsWith;
 
-// A message of a stream: seconds, then what it says.
-struct Step {
-  double at;
-  ValueMap says;
-};
-
-const Value kOn(true);
-const Value kOff(false);
-
-class VolumeMessagesTest : public ReportingTest {
+class VolumeMessagesTest : public ProducerTest {
  protected:
   VolumeMessagesTest()
-      : ReportingTest({&TWReportingSessionVolumeMessagesWorker::kWorkerClass,
-                       &TWReportingSessionMetriconWorker::kWorkerClass}) {
-    session = makeSession();
-  }
-
-  static TWReportingSessionMessages stream(const std::vector<Step>& steps) {
-    TWReportingSessionMessages messages;
-    for (const Step& step : steps) messages.push_back(messageAt(step.at, step.says));
-    return messages;
-  }
+      : ProducerTest({&TWReportingSessionVolumeMessagesWorker::kWorkerClass,
+                      &TWReportingSessionMetriconWorker::kWorkerClass}) {}
 
   TWReportingSessionMessages summariesOf(const TWReportingSessionMessages& messages) {
     const TWReportingSessionVolumeMessagesWorker worker(session);
@@ -56,17 +42,9 @@ class VolumeMessagesTest : public ReportingTest {
     }
     return played;
   }
-
-  std::shared_ptr<TWReportingSession> session;
 };
 
-// Streams and the summaries expected of them, to be checked by eye.
-
-struct StreamCase {
-  std::string name;
-  std::vector<Step> stream;
-  std::vector<std::string> expected;  // "seconds@volume"
-};
+// Streams and the summaries expected of them, each as "seconds@volume".
 
 class VolumeStreamTest : public VolumeMessagesTest, public ::testing::WithParamInterface<StreamCase> {};
 
@@ -288,36 +266,26 @@ TEST_F(VolumeMessagesTest, SaysWhatItDoesWithEachStretch) {
                   "added volume message { func=createVolumeMessages, action=add, count=1 }",
                   StartsWith("playingTime { func=createVolumeMessages, playingTime=0.250000,"),
                   "skipped volume message, too short { func=createVolumeMessages, action=skip, count=1 }"));
+  for (const auto& line : test.log.linesOf("twrr", LogLevel::kDebug)) {
+    EXPECT_THAT(line.message, StartsWith("TWReportingSessionVolumeMessagesWorker:"));
+  }
 }
 
 // Whatever a stream holds, the walk neither crashes nor reads the clock, and changes the stored messages by
 // nothing but the merging of rapid ones.
 RC_GTEST_FIXTURE_PROP(VolumeMessagesTest, SurvivesAnyStream, ()) {
-  const auto anyValue = rc::gen::oneOf(
-      rc::gen::map(rc::gen::arbitrary<bool>(), [](bool b) { return Value(b); }),
-      rc::gen::map(rc::gen::arbitrary<double>(), [](double d) { return Value(d); }),
-      rc::gen::map(rc::gen::inRange(-1, 3), [](int i) { return Value(i); }), rc::gen::just(Value("text")),
-      rc::gen::just(Value(ValueArray{1})), rc::gen::just(Value(std::nan(""))));
-  const auto anyKey = rc::gen::elementOf(
-      std::vector<std::string>{kRunning, kVolume, "session_duration", "twreporting_timestamp",
-                               "active_devices", "spatializationEnabled", "spatial-audio-accessory-feature",
-                               "ringerstate", "mFormatID", "session_selected_format", "other"});
-  TWReportingSessionMessages messages;
-  std::vector<ValueMap> before;
-  const auto size = *rc::gen::inRange(0, 20);
-  for (int n = 0; n < size; ++n) {
-    ValueMap payload;
-    for (int k = *rc::gen::inRange(0, 5); k > 0; --k) payload.set(*anyKey, *anyValue);
-    messages.push_back(message(payload));
-    before.push_back(payload);
-  }
+  const auto messages = anyStream({kRunning, kVolume, "session_duration", "active_devices",
+                                   "spatializationEnabled", "spatial-audio-accessory-feature", "ringerstate",
+                                   "mFormatID", "session_selected_format", "other"});
+  const auto expected = copiesOf(messages);
+  const std::array<std::string_view, 2> keys{"spatial-audio-accessory-feature", "spatializationEnabled"};
+  TWReportingSessionWorkerUtility::combineRapidMessages(expected, keys, 5.0);
+  const std::uint64_t clockReads = test.clock.wallReads();
+
   const auto summaries = summariesOf(messages);
-  for (std::size_t n = 0; n < messages.size(); ++n) {
-    const bool mayMerge =
-        before[n].contains("spatializationEnabled") || before[n].contains("spatial-audio-accessory-feature");
-    if (!mayMerge) RC_ASSERT(messages[n]->message == before[n]);
-    for (const auto& entry : before[n]) RC_ASSERT(messages[n]->message.contains(entry.key));
-  }
+  RC_CLASSIFY(!summaries.empty());
+  RC_ASSERT(test.clock.wallReads() == clockReads);
+  RC_ASSERT(payloadsOf(messages) == payloadsOf(expected));
   for (const auto& summary : summaries) {
     RC_ASSERT(summary->message.number("play_seconds") > 0.5);
     RC_ASSERT(summary->message.size() == 14U);
