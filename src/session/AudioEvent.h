@@ -10,6 +10,7 @@ namespace tonewerk {
 using AudioEventCategory = std::uint32_t;
 
 inline constexpr AudioEventCategory kCategoryGeneric = 1;
+inline constexpr AudioEventCategory kCategoryInput = 3;
 inline constexpr AudioEventCategory kCategorySetup = 8;
 inline constexpr AudioEventCategory kCategoryError = 11;
 inline constexpr AudioEventCategory kCategoryVolume = 14;

@@ -21,6 +21,7 @@ inline constexpr std::string_view TWReportingInternalEventSystemUptimeSec = "sys
 inline constexpr std::string_view TWReportingQMApplicationName = "QMHostApplicationDisplayID";
 
 inline constexpr std::string_view TWReportingMessageKeySessionOutputRunning = "session_output_running";
+inline constexpr std::string_view TWReportingMessageKeySessionInputRunning = "session_input_running";
 inline constexpr std::string_view TWReportingMessageKeySessionDuration = "session_duration";
 inline constexpr std::string_view TWReportingMessageKeySelectedFormat = "session_selected_format";
 inline constexpr std::string_view TWReportingMessageKeyActiveDevices = "active_devices";
@@ -34,6 +35,15 @@ inline constexpr std::string_view TWReportingMessageKeyVolume = "QMSessionVolume
 inline constexpr std::string_view TWReportingMessageKeyVolumeBucketed = "QMSessionVolumeBucketed";
 inline constexpr std::string_view TWReportingMessageKeyPlayseconds = "play_seconds";
 inline constexpr std::string_view TWReportingMessageKeyPlaysecondsBucketed = "play_secondsBucketed";
+inline constexpr std::string_view TWReportingMessageKeyVpConfigOperationMode = "vp_config_operation_mode";
+inline constexpr std::string_view TWReportingMessageKeyVpConfigInputPort = "vp_config_input_port";
+inline constexpr std::string_view TWReportingMessageKeyVpConfigPrimaryVocoder = "vp_config_primary_vocoder";
+inline constexpr std::string_view TWReportingMessageKeyVpConfigPrimaryVocoderFs =
+    "vp_config_primary_vocoderFs";
+inline constexpr std::string_view TWReportingMessageKeyInputrunningSeconds = "inputrunning_seconds";
+inline constexpr std::string_view TWReportingMessageKeyInputrunningSecondsBucketed =
+    "inputrunning_secondsBucketed";
+inline constexpr std::string_view TWReportingMessageKeyVocoders = "vocoders";
 inline constexpr std::string_view TWReportingMessageKeyMessageIndex = "msgidx";
 inline constexpr std::string_view TWReportingMessageKeyMessageCount = "msgcnt";
 inline constexpr std::string_view TWReportingMessageKeyIssueType = "issue_type";

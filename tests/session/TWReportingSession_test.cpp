@@ -486,7 +486,8 @@ TEST_F(WorkerTest, AClassWhoseInstancesCannotBeMadeIsLeftOut) {
 TEST_F(WorkerTest, TheDaemonsClassesComeInTheRegistrysOrder) {
   EXPECT_THAT(namesOf(allWorkerClasses()),
               ElementsAre("TWReportingSessionVolumeMessagesWorker", "TWReportingSessionSummaryWorker",
-                          "TWReportingSessionMetriconWorker", "TWReportingSessionSummaryJsonFileWorker"));
+                          "TWReportingSessionInputMessagesWorker", "TWReportingSessionMetriconWorker",
+                          "TWReportingSessionSummaryJsonFileWorker"));
 }
 
 TEST_F(WorkerTest, TheRegistryIsFilledOnce) {
