@@ -14,6 +14,7 @@ inline constexpr AudioEventCategory kCategoryInput = 3;
 inline constexpr AudioEventCategory kCategorySetup = 8;
 inline constexpr AudioEventCategory kCategoryError = 11;
 inline constexpr AudioEventCategory kCategoryVolume = 14;
+inline constexpr AudioEventCategory kCategoryGather = 15;
 inline constexpr AudioEventCategory kCategoryUnknown = 0xFFFFFFFF;
 inline constexpr AudioEventCategory kDomainSession = 0x08000000;
 

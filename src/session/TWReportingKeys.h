@@ -35,6 +35,7 @@ inline constexpr std::string_view TWReportingMessageKeyVolume = "QMSessionVolume
 inline constexpr std::string_view TWReportingMessageKeyVolumeBucketed = "QMSessionVolumeBucketed";
 inline constexpr std::string_view TWReportingMessageKeyPlayseconds = "play_seconds";
 inline constexpr std::string_view TWReportingMessageKeyPlaysecondsBucketed = "play_secondsBucketed";
+inline constexpr std::string_view TWReportingMessageKeyGatherSession = "gather_session";
 inline constexpr std::string_view TWReportingMessageKeyVpConfigOperationMode = "vp_config_operation_mode";
 inline constexpr std::string_view TWReportingMessageKeyVpConfigInputPort = "vp_config_input_port";
 inline constexpr std::string_view TWReportingMessageKeyVpConfigPrimaryVocoder = "vp_config_primary_vocoder";

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "workers/TWReportingWorkerClasses.h"
 
+#include "workers/producers/TWReportingSessionGatherMessagesWorker.h"
 #include "workers/producers/TWReportingSessionInputMessagesWorker.h"
 #include "workers/producers/TWReportingSessionVolumeMessagesWorker.h"
 #include "workers/sinks/TWReportingSessionMetriconWorker.h"
@@ -14,6 +15,7 @@ namespace tonewerk {
 std::vector<const TWReportingSessionWorkerClass*> allWorkerClasses() {
   return {
       &TWReportingSessionVolumeMessagesWorker::kWorkerClass,
+      &TWReportingSessionGatherMessagesWorker::kWorkerClass,
       &TWReportingSessionSummaryWorker::kWorkerClass,
       &TWReportingSessionInputMessagesWorker::kWorkerClass,
       &TWReportingSessionMetriconWorker::kWorkerClass,

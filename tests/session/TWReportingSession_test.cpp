@@ -485,9 +485,9 @@ TEST_F(WorkerTest, AClassWhoseInstancesCannotBeMadeIsLeftOut) {
 
 TEST_F(WorkerTest, TheDaemonsClassesComeInTheRegistrysOrder) {
   EXPECT_THAT(namesOf(allWorkerClasses()),
-              ElementsAre("TWReportingSessionVolumeMessagesWorker", "TWReportingSessionSummaryWorker",
-                          "TWReportingSessionInputMessagesWorker", "TWReportingSessionMetriconWorker",
-                          "TWReportingSessionSummaryJsonFileWorker"));
+              ElementsAre("TWReportingSessionVolumeMessagesWorker", "TWReportingSessionGatherMessagesWorker",
+                          "TWReportingSessionSummaryWorker", "TWReportingSessionInputMessagesWorker",
+                          "TWReportingSessionMetriconWorker", "TWReportingSessionSummaryJsonFileWorker"));
 }
 
 TEST_F(WorkerTest, TheRegistryIsFilledOnce) {

@@ -1,0 +1,318 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "workers/producers/TWReportingSessionGatherMessagesWorker.h"
+
+#include <cmath>
+#include <gtest/gtest.h>
+#include <rapidcheck/gtest.h>
+#include <string>
+#include <vector>
+
+#include "workers/producers/ProducerTest.h"
+#include "workers/sinks/TWReportingSessionMetriconWorker.h"
+#include "workers/sinks/TWReportingSessionSummaryJsonFileWorker.h"
+
+namespace tonewerk {
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+using ::testing::SizeIs;
+using ::testing::StartsWith;
+
+const char kRunning[] = "session_output_running";
+const char kGather[] = "gather_session";
+const char kDevices[] = "active_devices";
+const char kFormat[] = "session_selected_format";
+
+class GatherMessagesTest : public ProducerTest {
+ protected:
+  GatherMessagesTest()
+      : ProducerTest({&TWReportingSessionGatherMessagesWorker::kWorkerClass,
+                      &TWReportingSessionMetriconWorker::kWorkerClass}) {}
+
+  TWReportingSessionMessages summariesOf(const TWReportingSessionMessages& messages) {
+    const TWReportingSessionGatherMessagesWorker worker(session);
+    return worker.createGatherMessages(messages, 0.5);
+  }
+
+  // Each summary as "seconds@devices", in order.
+  std::vector<std::string> playedIn(const std::vector<Step>& steps) {
+    std::vector<std::string> played;
+    for (const auto& summary : summariesOf(stream(steps))) {
+      played.push_back(summary->message.text("play_seconds") + "@" + summary->message.text("active_devices"));
+    }
+    return played;
+  }
+};
+
+// Streams and the summaries expected of them, each as "seconds@devices".
+
+class GatherStreamTest : public GatherMessagesTest, public ::testing::WithParamInterface<StreamCase> {};
+
+TEST_P(GatherStreamTest, IsSummarised) { EXPECT_EQ(playedIn(GetParam().stream), GetParam().expected); }
+
+INSTANTIATE_TEST_SUITE_P(
+    Streams, GatherStreamTest,
+    ::testing::Values(
+        StreamCase{"Nothing", {}, {}},
+        StreamCase{"PlayedInAGatherSession",
+                   {{0, {{kRunning, kOn}, {kGather, 1}}}, {12, {{kRunning, kOff}}}},
+                   {"12@unknown"}},
+        StreamCase{"PlayedForExactlyTheMinimum",
+                   {{0, {{kRunning, kOn}, {kGather, 1}}}, {0.5, {{kRunning, kOff}}}},
+                   {}},
+        StreamCase{"PlayedForALittleMoreThanTheMinimum",
+                   {{0, {{kRunning, kOn}, {kGather, 1}}}, {0.625, {{kRunning, kOff}}}},
+                   {"0.625@unknown"}},
+        StreamCase{"PlayedOutsideGather", {{0, {{kRunning, kOn}}}, {12, {{kRunning, kOff}}}}, {}},
+        StreamCase{"GatherIsNotOne",  // only 1 begins a stretch
+                   {{0, {{kRunning, kOn}, {kGather, 2}}}, {12, {{kRunning, kOff}}}},
+                   {}},
+        StreamCase{"GatherIsOneAsText",  // a text reads as its number
+                   {{0, {{kRunning, kOn}, {kGather, "1"}}}, {12, {{kRunning, kOff}}}},
+                   {"12@unknown"}},
+        StreamCase{"JoinedBeforeTheStart",  // the start itself has to say so
+                   {{0, {{kGather, 1}}}, {1, {{kRunning, kOn}}}, {12, {{kRunning, kOff}}}},
+                   {}},
+        StreamCase{"JoinedWhilePlaying",  // begins no stretch
+                   {{0, {{kRunning, kOn}}}, {4, {{kGather, 1}}}, {12, {{kRunning, kOff}}}},
+                   {}},
+        StreamCase{"JoinedWhilePlayingAndStopsSayingSo",
+                   {{0, {{kRunning, kOn}}}, {4, {{kGather, 1}}}, {12, {{kRunning, kOff}, {kGather, 1}}}},
+                   {}},
+        StreamCase{"JoinedWhilePlayingThenChangedDevices",  // the change begins one
+                   {{0, {{kRunning, kOn}}},
+                    {4, {{kGather, 1}}},
+                    {6, {{kDevices, "Speaker"}}},
+                    {12, {{kRunning, kOff}}}},
+                   {"6@Speaker"}},
+        StreamCase{"DevicesChanged",
+                   {{0, {{kRunning, kOn}, {kGather, 1}, {kDevices, "Speaker"}}},
+                    {4, {{kDevices, "Headphones"}}},
+                    {12, {{kRunning, kOff}}}},
+                   {"4@Speaker", "8@Headphones"}},
+        StreamCase{"SelectedFormatChanged",  // also from the one it was not known by
+                   {{0, {{kRunning, kOn}, {kGather, 1}}}, {4, {{kFormat, "A"}}}, {12, {{kRunning, kOff}}}},
+                   {"4@unknown", "8@unknown"}},
+        StreamCase{"SelectedFormatSaidAgain",
+                   {{0, {{kRunning, kOn}, {kGather, 1}, {kFormat, "A"}}},
+                    {4, {{kFormat, "A"}}},
+                    {12, {{kRunning, kOff}}}},
+                   {"12@unknown"}},
+        StreamCase{"OnlyCarriedContextChanged",
+                   {{0, {{kRunning, kOn}, {kGather, 1}}},
+                    {2, {{"mFormatID", "aac"}}},
+                    {4, {{"mChannelsPerFrame", 2}}},
+                    {12, {{kRunning, kOff}}}},
+                   {"12@unknown"}},
+        StreamCase{"DevicesChangedWhileSilent",
+                   {{0, {{kRunning, kOn}, {kGather, 1}}},
+                    {3, {{kRunning, kOff}}},
+                    {4, {{kDevices, "Speaker"}}},
+                    {5, {{kRunning, kOn}, {kGather, 1}}},
+                    {7, {{kRunning, kOff}}}},
+                   {"3@unknown", "2@Speaker"}},
+        StreamCase{"LeftWithoutAWordOnOutput",  // closes nothing
+                   {{0, {{kRunning, kOn}, {kGather, 1}}}, {4, {{kGather, 0}}}, {12, {{kRunning, kOff}}}},
+                   {"12@unknown"}},
+        StreamCase{"LeftTwice",  // the second time the stretch was in no Gather session any more
+                   {{0, {{kRunning, kOn}, {kGather, 1}}},
+                    {4, {{kGather, 0}}},
+                    {6, {{kGather, 0}}},
+                    {12, {{kRunning, kOff}}}},
+                   {"6@unknown", "6@unknown"}},
+        StreamCase{"AnotherNumberAndThenLeft",
+                   {{0, {{kRunning, kOn}, {kGather, 1}}},
+                    {4, {{kGather, 2}}},
+                    {6, {{kGather, 0}}},
+                    {12, {{kRunning, kOff}}}},
+                   {"6@unknown", "6@unknown"}},
+        StreamCase{"LeftWithAnotherStart",
+                   {{0, {{kRunning, kOn}, {kGather, 1}}},
+                    {4, {{kRunning, kOn}, {kGather, 0}}},
+                    {12, {{kRunning, kOff}}}},
+                   {"4@unknown", "8@unknown"}},
+        StreamCase{"StartedAgainWithoutAWordOnGather",
+                   {{0, {{kRunning, kOn}, {kGather, 1}}}, {4, {{kRunning, kOn}}}, {12, {{kRunning, kOff}}}},
+                   {"4@unknown", "8@unknown"}},
+        StreamCase{"StartedAgainInGather",
+                   {{0, {{kRunning, kOn}, {kGather, 1}}},
+                    {4, {{kRunning, kOn}, {kGather, 1}}},
+                    {12, {{kRunning, kOff}}}},
+                   {"12@unknown"}},
+        StreamCase{"StoppedTwice",
+                   {{0, {{kRunning, kOn}, {kGather, 1}}}, {4, {{kRunning, kOff}}}, {12, {{kRunning, kOff}}}},
+                   {"4@unknown"}},
+        StreamCase{"EndedByTheSessionsDuration",
+                   {{0, {{kRunning, kOn}, {kGather, 1}}}, {10, {{"session_duration", 10.0}}}},
+                   {"10@unknown"}},
+        StreamCase{"DurationSaysStillRunning",  // a stretch closes and the next one begins
+                   {{0, {{kRunning, kOn}, {kGather, 1}}},
+                    {10, {{"session_duration", 10.0}, {kRunning, kOn}, {kGather, 1}}},
+                    {12, {{kRunning, kOff}}}},
+                   {"10@unknown", "2@unknown"}},
+        StreamCase{"NeverStopped", {{0, {{kRunning, kOn}, {kGather, 1}}}, {4, {{"other", 1}}}}, {}},
+        StreamCase{"ShortStretchesInBetween",
+                   {{0, {{kRunning, kOn}, {kGather, 1}, {kDevices, "A"}}},
+                    {2, {{kDevices, "B"}}},
+                    {2.25, {{kDevices, "C"}}},
+                    {5.25, {{kRunning, kOff}}}},
+                   {"2@A", "3@C"}},
+        StreamCase{"TimesGoBack", {{10, {{kRunning, kOn}, {kGather, 1}}}, {2, {{kRunning, kOff}}}}, {}}),
+    [](const auto& tested) { return tested.param.name; });
+
+TEST_F(GatherMessagesTest, IsAProducerFromTheSessionsStart) {
+  const auto& workerClass = TWReportingSessionGatherMessagesWorker::kWorkerClass;
+  EXPECT_TRUE(workerClass.isProducer);
+  EXPECT_FALSE(workerClass.isConsumer);
+  EXPECT_FALSE(workerClass.startOnInit);
+  EXPECT_FALSE(workerClass.handleSingleMessageSession);
+}
+
+TEST_F(GatherMessagesTest, ASummaryHoldsTheContextOfTheClosingStretch) {
+  const auto summaries = summariesOf(stream({{0,
+                                              {{kRunning, kOn},
+                                               {kGather, 1},
+                                               {kDevices, "Speaker"},
+                                               {kFormat, "48 kHz"},
+                                               {"mFormatID", "lpcm"},
+                                               {"mChannelsPerFrame", 2}}},
+                                             {12, {{kRunning, kOff}, {"mFormatID", "later"}}}}));
+  ASSERT_THAT(summaries, SizeIs(1));
+  EXPECT_EQ(summaries[0]->category, 15U);
+  EXPECT_EQ(summaries[0]->type, 11);
+  EXPECT_EQ(
+      summaries[0]->message.text(),
+      R"({"session_selected_format":"48 kHz","mFormatID":"lpcm","active_devices":"Speaker",)"
+      R"("play_seconds":12.0,"mChannelsPerFrame":2,"play_secondsBucketed":"10","msgidx":1,"msgcnt":1})");
+  EXPECT_EQ(summaries[0]->message.find("msgidx")->kind(), Value::Kind::kInteger);
+}
+
+TEST_F(GatherMessagesTest, WhatIsNotKnownHasItsDefault) {
+  const auto summaries = summariesOf(stream({{0, {{kRunning, kOn}, {kGather, 1}}}, {1, {{kRunning, kOff}}}}));
+  ASSERT_THAT(summaries, SizeIs(1));
+  EXPECT_EQ(summaries[0]->message.text(),
+            R"({"session_selected_format":"unknown","mFormatID":"unknown","active_devices":"unknown",)"
+            R"("play_seconds":1.0,"mChannelsPerFrame":-1,"play_secondsBucketed":"1","msgidx":1,"msgcnt":1})");
+}
+
+TEST_F(GatherMessagesTest, SummariesAreForTheAnalyticsAndTheJsonFileOnly) {
+  const auto summaries =
+      summariesOf(stream({{0, {{kRunning, kOn}, {kGather, 1}}}, {12, {{kRunning, kOff}}}}));
+  ASSERT_THAT(summaries, SizeIs(1));
+  EXPECT_THAT(summaries[0]->destinationWorkers,
+              ElementsAre(&TWReportingSessionMetriconWorker::kWorkerClass,
+                          &TWReportingSessionSummaryJsonFileWorker::kWorkerClass));
+}
+
+TEST_F(GatherMessagesTest, SummariesAreNumberedAndCounted) {
+  const auto summaries = summariesOf(
+      stream({{0, {{kRunning, kOn}, {kGather, 1}}}, {3, {{kDevices, "A"}}}, {10, {{kRunning, kOff}}}}));
+  EXPECT_THAT(textsUnder("msgidx", summaries), ElementsAre("1", "2"));
+  EXPECT_THAT(textsUnder("msgcnt", summaries), ElementsAre("2", "2"));
+  EXPECT_EQ(summaries[0]->message.find("msgcnt")->kind(), Value::Kind::kUnsigned);
+}
+
+TEST_F(GatherMessagesTest, PlaySecondsHaveSinglePrecision) {
+  const auto summaries =
+      summariesOf(stream({{0, {{kRunning, kOn}, {kGather, 1}}}, {1.1, {{kRunning, kOff}}}}));
+  ASSERT_THAT(summaries, SizeIs(1));
+  EXPECT_EQ(summaries[0]->message.number("play_seconds"), static_cast<double>(1.1F));
+}
+
+TEST_F(GatherMessagesTest, WithoutTimesThereIsNoSummary) {
+  EXPECT_THAT(summariesOf({message({{kRunning, kOn}, {kGather, 1}}), messageAt(10, {{kRunning, kOff}})}),
+              IsEmpty());
+  EXPECT_THAT(summariesOf({messageAt(0, {{kRunning, kOn}, {kGather, 1}}), message({{kRunning, kOff}})}),
+              IsEmpty());
+  EXPECT_THAT(summariesOf({messageAt(0, {{kRunning, kOn}, {kGather, 1}}),
+                           messageAt(std::nan(""), {{kRunning, kOff}})}),
+              IsEmpty());
+}
+
+TEST_F(GatherMessagesTest, AnOpenStretchInThePreviousValuesGoesOn) {
+  session->addPreviousValues(
+      {{kRunning, kOn}, {kGather, 1}, {kDevices, "Speaker"}, {"twreporting_timestamp", 4.0}});
+  EXPECT_THAT(playedIn({{10, {{kRunning, kOff}}}}), ElementsAre("6@Speaker"));
+}
+
+TEST_F(GatherMessagesTest, AnOpenStretchOutsideGatherInThePreviousValuesYieldsNoSummary) {
+  session->addPreviousValues({{kRunning, kOn}, {"twreporting_timestamp", 4.0}});
+  EXPECT_THAT(playedIn({{10, {{kRunning, kOff}}}}), IsEmpty());
+}
+
+TEST_F(GatherMessagesTest, AnyValueUnderGatherSessionIsEnoughForAnOpenStretch) {
+  session->addPreviousValues({{kRunning, kOn}, {kGather, 0}, {"twreporting_timestamp", 4.0}});
+  EXPECT_THAT(playedIn({{10, {{kRunning, kOff}}}}), ElementsAre("6@unknown"));
+}
+
+TEST_F(GatherMessagesTest, RapidSpatialMessagesStayApart) {
+  const auto messages = stream({{0, {{kRunning, kOn}, {kGather, 1}}},
+                                {2, {{"spatial-audio-accessory-feature", true}}},
+                                {2.5, {{"spatializationEnabled", true}, {kDevices, "A"}}},
+                                {10, {{kRunning, kOff}}}});
+  EXPECT_THAT(textsUnder("play_seconds", summariesOf(messages)), ElementsAre("2.5", "7.5"));
+  EXPECT_FALSE(messages[1]->message.contains(kDevices));
+}
+
+TEST_F(GatherMessagesTest, StopSendsTheSummariesIntoTheSession) {
+  session->start();
+  const double now = test.clock.now();
+  session->sendMessage(messageAt(now, {{kRunning, kOn}, {kGather, 1}}));
+  session->sendMessage(messageAt(now + 3, {{kRunning, kOff}}));
+  session->stop();
+  const auto events = test.metricon.eventsNamed("com.orvane.tonewerk.Gather.Summary");
+  ASSERT_THAT(events, SizeIs(1));
+  EXPECT_EQ(events[0].number("play_seconds"), 3.0);
+  EXPECT_EQ(events[0].text("HostApplicationDisplayID"), "Unknown");  // as of any message without one
+  EXPECT_EQ(events[0].text("audiotag"), "GatherSummary");
+  EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kDefault),
+              ElementsAre("sending gather event for reporter 77"));
+}
+
+TEST_F(GatherMessagesTest, AStopWithoutSummariesSendsAndSaysNothing) {
+  session->start();
+  session->stop();
+  EXPECT_THAT(test.metricon.events(), IsEmpty());
+  EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kDefault), IsEmpty());
+}
+
+TEST_F(GatherMessagesTest, SaysWhatItDoesWithEachStretch) {
+  test.log.clear();
+  playedIn({{0, {{kRunning, kOn}, {kGather, 1}}}, {2, {{kDevices, "A"}}}, {2.25, {{kRunning, kOff}}}});
+  EXPECT_THAT(
+      test.log.textsOf("twrr", LogLevel::kDebug),
+      ElementsAre("entering createGatherMessages createGatherMessages",
+                  "playingTime { func=createGatherMessages, playingTime=2.000000, twTimestamp=2, "
+                  "twTimestamp_double=2.000000, startTwTimestamp=0, startTwTimestamp_double=0.000000 }",
+                  "added gather message { func=createGatherMessages, action=add, count=1 }",
+                  StartsWith("playingTime { func=createGatherMessages, playingTime=0.250000,"),
+                  "skipped gather message, too short { func=createGatherMessages, action=skip, count=1 }"));
+  for (const auto& line : test.log.linesOf("twrr", LogLevel::kDebug)) {
+    EXPECT_THAT(line.message, StartsWith("TWReportingSessionGatherMessagesWorker:"));
+  }
+}
+
+// Whatever a stream holds, the walk neither crashes nor reads the clock, and leaves the stored messages as
+// they are.
+RC_GTEST_FIXTURE_PROP(GatherMessagesTest, SurvivesAnyStream, ()) {
+  const auto messages =
+      anyStream({kRunning, kGather, kDevices, kFormat, "session_duration", "mFormatID", "mChannelsPerFrame",
+                 "spatializationEnabled", "spatial-audio-accessory-feature", "other"});
+  const auto before = payloadsOf(copiesOf(messages));
+  const std::uint64_t clockReads = test.clock.wallReads();
+
+  const auto summaries = summariesOf(messages);
+  RC_CLASSIFY(!summaries.empty());
+  RC_ASSERT(test.clock.wallReads() == clockReads);
+  RC_ASSERT(payloadsOf(messages) == before);
+  for (const auto& summary : summaries) {
+    RC_ASSERT(summary->message.number("play_seconds") > 0.5);
+    RC_ASSERT(summary->message.size() == 8U);
+    RC_ASSERT(summary->message.integer("msgcnt") == static_cast<std::int64_t>(summaries.size()));
+    RC_ASSERT(summary->destinationWorkers.size() == 2U);
+  }
+}
+
+}  // namespace
+}  // namespace tonewerk
