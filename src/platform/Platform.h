@@ -7,6 +7,7 @@ namespace tonewerk {
 
 class Clock;
 class DeviceFacts;
+class Energybook;
 class FileSystem;
 class JsonService;
 class Log;
@@ -32,6 +33,7 @@ struct Platform {
   FileSystem& files;
   JsonService& json;
   Metricon& metricon;
+  Energybook& energybook;
   // Where reports for people go; absolute.
   std::string logsDirectory = {};
 };

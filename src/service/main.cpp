@@ -19,6 +19,7 @@
 #include "platform/linux/LinuxPlatform.h"
 #include "platform/linux/ReportStore.h"
 #include "platform/linux/ServerSocket.h"
+#include "platform/linux/StoreEnergybook.h"
 #include "platform/linux/StoreMetricon.h"
 #include "platform/linux/UnixSocketListener.h"
 #include "service/TWReportingService.h"
@@ -54,6 +55,7 @@ class Daemon {
          const LogCategory& log)
       : store_(directories.state, linux.json(), linux.preferences(), linux.clock(), log),
         metricon_(store_, linux.preferences(), linux.clock(), log),
+        energybook_(store_, linux.clock()),
         context_(platformOf(linux, directories), allWorkerClasses()),
         service_(TWReportingService::make([this] { endOnKillRequest(); })),
         listener_(std::move(socket), log) {
@@ -72,7 +74,7 @@ class Daemon {
 
  private:
   Platform platformOf(LinuxPlatform& linux, const Directories& directories) {
-    Platform platform = linux.platform(metricon_);
+    Platform platform = linux.platform(metricon_, energybook_);
     platform.logsDirectory = directories.logs;
     return platform;
   }
@@ -90,6 +92,7 @@ class Daemon {
 
   ReportStore store_;
   StoreMetricon metricon_;
+  StoreEnergybook energybook_;
   TWReportingContext context_;
   std::shared_ptr<TWReportingService> service_;
   UnixSocketListener listener_;

@@ -6,6 +6,7 @@
 #include "support/ManualQueues.h"
 #include "support/ManualTimers.h"
 #include "support/MemoryDeviceFacts.h"
+#include "support/MemoryEnergybook.h"
 #include "support/MemoryFileSystem.h"
 #include "support/MemoryJsonService.h"
 #include "support/MemoryLog.h"
@@ -31,8 +32,8 @@ struct TestPlatform {
   TestPlatform& operator=(const TestPlatform&) = delete;
 
   Platform platform() {
-    return {log,         tracePoints, clock, queues, timers,   processes, system,
-            deviceFacts, preferences, files, json,   metricon, "/logs"};
+    return {log,         tracePoints, clock, queues, timers,   processes,  system,
+            deviceFacts, preferences, files, json,   metricon, energybook, "/logs"};
   }
 
   MemoryLog log;
@@ -47,6 +48,7 @@ struct TestPlatform {
   MemoryFileSystem files;
   MemoryJsonService json;
   MemoryMetricon metricon;
+  MemoryEnergybook energybook;
 };
 
 }  // namespace tonewerk

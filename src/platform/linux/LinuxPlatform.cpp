@@ -63,10 +63,10 @@ TimerService& LinuxPlatform::timers() { return adapters_->timers; }
 PreferenceStore& LinuxPlatform::preferences() { return adapters_->preferences; }
 JsonService& LinuxPlatform::json() { return adapters_->json; }
 
-Platform LinuxPlatform::platform(Metricon& metricon) {
+Platform LinuxPlatform::platform(Metricon& metricon, Energybook& energybook) {
   Adapters& a = *adapters_;
-  return {*a.log,        a.tracePoints, a.clock, a.queues, a.timers, a.processes,    a.system,
-          a.deviceFacts, a.preferences, a.files, a.json,   metricon, a.logsDirectory};
+  return {*a.log,        a.tracePoints, a.clock, a.queues, a.timers, a.processes, a.system,
+          a.deviceFacts, a.preferences, a.files, a.json,   metricon, energybook,  a.logsDirectory};
 }
 
 }  // namespace tonewerk

@@ -12,7 +12,8 @@ struct Directories;
 // One of each adapter, and the Platform made of them. Whoever makes it lets it outlive what uses the
 // Platform.
 //
-// Metricon is the caller's: its adapter needs the clock, the log and the preferences from here.
+// What records into the report store is the caller's: its adapters need the clock, the log and the
+// preferences from here.
 class LinuxPlatform {
  public:
   explicit LinuxPlatform(const Directories& directories);
@@ -27,8 +28,8 @@ class LinuxPlatform {
   PreferenceStore& preferences();
   JsonService& json();
 
-  // `metricon` outlives what uses the result.
-  Platform platform(Metricon& metricon);
+  // `metricon` and `energybook` outlive what uses the result.
+  Platform platform(Metricon& metricon, Energybook& energybook);
 
  private:
   struct Adapters;

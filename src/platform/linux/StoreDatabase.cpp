@@ -36,6 +36,8 @@ bool StoreDatabase::insert(const AnalyticsRow& row) { return analytics_->insert(
 
 bool StoreDatabase::insert(const MetricRow& row) { return metrics_->insert(row); }
 
+bool StoreDatabase::insert(const PowerRow& row) { return power_->insert(row); }
+
 void StoreDatabase::setBounds(const StoreBounds& bounds) {
   bounds_ = bounds;
   if (database_.isOpen()) applyBounds();
@@ -84,6 +86,7 @@ StoreDatabase::Result StoreDatabase::open() {
   applyBounds();
   analytics_.emplace(database_, json_);
   metrics_.emplace(database_);
+  power_.emplace(database_, json_);
   trimmer_.emplace(database_);
   return Result::kDone;
 }
@@ -127,6 +130,7 @@ void StoreDatabase::close() {
   // Statements before their database. An open transaction is undone.
   analytics_.reset();
   metrics_.reset();
+  power_.reset();
   trimmer_.reset();
   database_.close();
 }

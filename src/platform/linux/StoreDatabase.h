@@ -7,6 +7,7 @@
 
 #include "platform/linux/AnalyticsTable.h"
 #include "platform/linux/MetricTable.h"
+#include "platform/linux/PowerTable.h"
 #include "platform/linux/SqliteDatabase.h"
 #include "platform/linux/StoreRow.h"
 #include "platform/linux/StoreTrimmer.h"
@@ -50,6 +51,7 @@ class StoreDatabase {
   bool prepareFile();
   bool insert(const AnalyticsRow& row);
   bool insert(const MetricRow& row);
+  bool insert(const PowerRow& row);
   void applyBounds();
   Result resultOf(StoreTrimmer::Outcome outcome, bool& moreToDo);
   Result fail();
@@ -62,6 +64,7 @@ class StoreDatabase {
   SqliteDatabase database_;
   std::optional<AnalyticsTable> analytics_;  // while it is open
   std::optional<MetricTable> metrics_;       // likewise
+  std::optional<PowerTable> power_;          // likewise
   std::optional<StoreTrimmer> trimmer_;      // likewise
   StoreBounds bounds_;
   std::string problem_;

@@ -32,8 +32,18 @@ struct MetricRow {
   std::size_t bytes() const { return sizeof(MetricRow) + record.size(); }
 };
 
+// An event of the power log.
+struct PowerRow {
+  double recordedAt = 0.0;  // seconds since 1970
+  std::int64_t group = 0;
+  SharedString name;
+  ValueMap payload;
+
+  std::size_t bytes() const { return sizeof(PowerRow) + payload.bytes(); }
+};
+
 // What the store writes as one row of one of its tables.
-using StoreRow = std::variant<AnalyticsRow, MetricRow>;
+using StoreRow = std::variant<AnalyticsRow, MetricRow, PowerRow>;
 
 inline std::size_t bytesOf(const StoreRow& row) {
   return std::visit([](const auto& held) { return held.bytes(); }, row);

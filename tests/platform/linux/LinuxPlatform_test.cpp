@@ -8,6 +8,7 @@
 #include "platform/DeviceFacts.h"
 #include "platform/PreferenceStore.h"
 #include "platform/linux/Directories.h"
+#include "support/MemoryEnergybook.h"
 #include "support/MemoryMetricon.h"
 #include "support/TemporaryDirectory.h"
 
@@ -23,13 +24,15 @@ TEST(LinuxPlatformTest, LooksForEverythingWhereTheDirectoriesSay) {
 
   LinuxPlatform linuxPlatform(directories);
   MemoryMetricon metricon;
-  const Platform platform = linuxPlatform.platform(metricon);
+  MemoryEnergybook energybook;
+  const Platform platform = linuxPlatform.platform(metricon, energybook);
   EXPECT_EQ(platform.deviceFacts.boolean("InternalBuild"), true);
   EXPECT_EQ(platform.preferences.read("com.orvane.test", "a"), Value(1));
   EXPECT_FALSE(platform.preferences.write("com.orvane.test", "b", 2));
   EXPECT_TRUE(std::filesystem::exists(root.path("state/preferences/com.orvane.test.toml")));
   EXPECT_EQ(platform.logsDirectory, root.path("logs"));
   EXPECT_EQ(&platform.metricon, &metricon);
+  EXPECT_EQ(&platform.energybook, &energybook);
 }
 
 }  // namespace

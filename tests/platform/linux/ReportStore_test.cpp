@@ -56,6 +56,9 @@ class ReportStoreTest : public testing::Test {
   void recordNumbered(int count, int first = 0) {
     for (int n = first; n < first + count; ++n) record("com.orvane.n", {{"n", n}});
   }
+  void recordPower(int n, const std::string& text = "") {
+    store_->record(PowerRow{clock_.now(), 28, "power", {{"n", n}, {"text", text}}});
+  }
   bool flush() { return store_->flush(kLongEnough); }
 
   std::string file() const { return directory_ + "/reports.db"; }
@@ -543,6 +546,57 @@ TEST_F(ReportStoreTest, DeletesTheOldestRowsOfWhateverTable) {
   EXPECT_EQ(number("SELECT count(*) FROM metric"), 1);
   EXPECT_EQ(number("SELECT count(*) FROM rtc_message"), 1);
   EXPECT_THAT(events(), SizeIs(2));
+}
+
+TEST_F(ReportStoreTest, KeepsPowerEventsBetweenAnalyticsEventsInTheirOrder) {
+  open();
+  for (int n = 0; n < 600; ++n) {
+    recordNumbered(1, n);
+    recordPower(n);
+  }
+  ASSERT_TRUE(flush());
+  EXPECT_THAT(events(), SizeIs(600));
+  EXPECT_EQ(number("SELECT count(*) FROM power_event"), 600);
+  EXPECT_EQ(number("SELECT count(*) FROM power_event WHERE payload ->> 'n' <> id - 1"), 0);
+}
+
+TEST_F(ReportStoreTest, DeletesPowerEventsThatAreOlderThanTheBound) {
+  open();
+  recordPower(1);
+  recordPower(2);
+  clock_.advance(20 * kDay);
+  recordPower(3);
+  ASSERT_TRUE(flush());
+  clock_.advance(11 * kDay);
+  recordPower(4);
+  ASSERT_TRUE(flush());
+  EXPECT_EQ(number("SELECT min(payload ->> 'n') FROM power_event"), 3);
+  EXPECT_EQ(number("SELECT count(*) FROM power_event"), 2);
+}
+
+TEST_F(ReportStoreTest, DeletesTheOldestPowerEventsToKeepTheFileWithinItsBound) {
+  preferences_.configure("com.orvane.tonewerk.store", "max_megabytes", 2);
+  open();
+  const std::string text(1000, 'x');
+  for (int n = 0; n < 6000; ++n) {
+    clock_.advance(0.01);
+    if (n % 2 == 0) {
+      recordPower(n, text);
+    } else {
+      record("com.orvane.n", {{"n", n}, {"text", text}});
+    }
+  }
+  ASSERT_TRUE(flush());
+  const std::int64_t oldest = number("SELECT min(payload ->> 'n') FROM power_event");
+  EXPECT_EQ(number("SELECT max(payload ->> 'n') FROM power_event"), 5998);
+  EXPECT_EQ(number("SELECT count(*) FROM power_event"), (6000 - oldest) / 2);  // none between is missing
+  EXPECT_GT(oldest, 4000);
+  EXPECT_LT(oldest, 5200);
+  // Both tables reach back to about the same time.
+  EXPECT_NEAR(static_cast<double>(number("SELECT min(payload ->> 'n') FROM analytics_event")),
+              static_cast<double>(oldest), 1100.0);
+  close();
+  EXPECT_LE(std::filesystem::file_size(file()), 2U << 20);
 }
 
 TEST_F(ReportStoreTest, LeavesOutBoundsThatAreNoNumberFromOne) {

@@ -1,0 +1,35 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstdint>
+#include <mutex>
+#include <string>
+#include <vector>
+
+#include "platform/Energybook.h"
+
+namespace tonewerk {
+
+// Keeps the events that were recorded. Any thread.
+//
+//   EXPECT_THAT(test.energybook.events(), SizeIs(1));
+class MemoryEnergybook final : public Energybook {
+ public:
+  struct Event {
+    std::int32_t group = 0;
+    std::string name;
+    ValueMap payload;
+
+    friend bool operator==(const Event&, const Event&) = default;
+  };
+
+  void sendEvent(std::int32_t group, const SharedString& name, ValueMap payload) override;
+
+  std::vector<Event> events() const;
+
+ private:
+  mutable std::mutex mutex_;
+  std::vector<Event> events_;  // guarded by mutex_
+};
+
+}  // namespace tonewerk
