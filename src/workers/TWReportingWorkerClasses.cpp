@@ -4,6 +4,7 @@
 #include "workers/producers/TWReportingSessionGatherMessagesWorker.h"
 #include "workers/producers/TWReportingSessionInputMessagesWorker.h"
 #include "workers/producers/TWReportingSessionVolumeMessagesWorker.h"
+#include "workers/sinks/TWReportingSessionEnergybookWorker.h"
 #include "workers/sinks/TWReportingSessionMetriconWorker.h"
 #include "workers/sinks/TWReportingSessionSummaryJsonFileWorker.h"
 #include "workers/sinks/TWReportingSessionSummaryWorker.h"
@@ -19,6 +20,7 @@ std::vector<const TWReportingSessionWorkerClass*> allWorkerClasses() {
       &TWReportingSessionSummaryWorker::kWorkerClass,
       &TWReportingSessionInputMessagesWorker::kWorkerClass,
       &TWReportingSessionMetriconWorker::kWorkerClass,
+      &TWReportingSessionEnergybookWorker::kWorkerClass,
       &TWReportingSessionSummaryJsonFileWorker::kWorkerClass,
   };
 }

@@ -487,7 +487,8 @@ TEST_F(WorkerTest, TheDaemonsClassesComeInTheRegistrysOrder) {
   EXPECT_THAT(namesOf(allWorkerClasses()),
               ElementsAre("TWReportingSessionVolumeMessagesWorker", "TWReportingSessionGatherMessagesWorker",
                           "TWReportingSessionSummaryWorker", "TWReportingSessionInputMessagesWorker",
-                          "TWReportingSessionMetriconWorker", "TWReportingSessionSummaryJsonFileWorker"));
+                          "TWReportingSessionMetriconWorker", "TWReportingSessionEnergybookWorker",
+                          "TWReportingSessionSummaryJsonFileWorker"));
 }
 
 TEST_F(WorkerTest, TheRegistryIsFilledOnce) {

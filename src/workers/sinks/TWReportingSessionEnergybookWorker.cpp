@@ -1,0 +1,96 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "workers/sinks/TWReportingSessionEnergybookWorker.h"
+
+#include <string_view>
+#include <utility>
+
+#include "platform/Energybook.h"
+#include "platform/LogLine.h"
+#include "session/TWReportingContext.h"
+#include "session/TWReportingKeys.h"
+#include "session/TWReportingSession.h"
+#include "session/TWReportingUtility.h"
+
+namespace tonewerk {
+namespace {
+
+constexpr std::int32_t kEventGroup = 28;
+const SharedString kEngineOnDurationEvent("Flumen_Haptics_EngineOnDuration");
+const SharedString kClientStatusEvent("Flumen_Haptics_ClientStatus");
+const SharedString kLeakedSessionEvent("LeakedHapticsSessionInfo");
+
+// Keys of the messages.
+constexpr std::string_view kEngineOnTime = "EngineOnTime";
+constexpr std::string_view kEngineState = "EngineState";
+// Keys of messages and events alike.
+constexpr std::string_view kActiveHardwareTime = "Haptic_Active_Hardware_Time_Seconds";
+constexpr std::string_view kActiveClients = "Active_Clients";
+// Keys of the events.
+constexpr std::string_view kEngineOnDuration = "EngineOnDuration";
+constexpr std::string_view kStatus = "Status";
+constexpr std::string_view kApplicationName = "ApplicationName";
+constexpr std::string_view kTimestampEnd = "TimestampEnd";
+
+const Value kEngineOn("EngineOn");
+constexpr std::string_view kUnknownApplication = "Unknown";
+
+void send(const SharedString& name, ValueMap payload) {
+  TWReportingContext::current().platform().energybook.sendEvent(kEventGroup, name, std::move(payload));
+}
+
+}  // namespace
+
+const TWReportingSessionWorkerClass TWReportingSessionEnergybookWorker::kWorkerClass =
+    workerClassOf<TWReportingSessionEnergybookWorker>("TWReportingSessionEnergybookWorker");
+
+bool TWReportingSessionEnergybookWorker::handleMessage(const TWReportingSessionMessage& message) {
+  if (message.type != kTypeEnergybook) return false;
+  handleEngineOnDurationMessage(message.message);
+  handleEngineStateMessage(message.message);
+  handleLongRunningMessage(message.message);
+  return false;
+}
+
+void TWReportingSessionEnergybookWorker::handleEngineOnDurationMessage(const ValueMap& message) const {
+  const Value* engineOnTime = message.find(kEngineOnTime);
+  if (engineOnTime == nullptr) return;
+  ValueMap payload{{kEngineOnDuration, *engineOnTime}};
+  const SharedString application = applicationName();
+  if (application != kUnknownApplication) {
+    payload.set(kApplicationName, application);
+  } else {
+    errorLog(TWReportingEnergybookCategory(), "failed to get app name for energybook");
+  }
+  if (const Value* timestamp = message.find(TWReportingMessageKeyTWTimestamp)) {
+    payload.set(kTimestampEnd, *timestamp);
+  } else {
+    errorLog(TWReportingEnergybookCategory(), "failed to get TWReporting timestamp for energybook");
+  }
+  send(kEngineOnDurationEvent, std::move(payload));
+}
+
+void TWReportingSessionEnergybookWorker::handleEngineStateMessage(const ValueMap& message) const {
+  const Value* engineState = message.find(kEngineState);
+  if (engineState == nullptr) return;
+  // Unlike for a duration, an unknown application is named so, and what is missing is not worth a line.
+  ValueMap payload{{kStatus, *engineState == kEngineOn}, {kApplicationName, applicationName()}};
+  if (const Value* timestamp = message.find(TWReportingMessageKeyTWTimestamp)) {
+    payload.set(kTimestampEnd, *timestamp);
+  }
+  send(kClientStatusEvent, std::move(payload));
+}
+
+void TWReportingSessionEnergybookWorker::handleLongRunningMessage(const ValueMap& message) {
+  const Value* activeTime = message.find(kActiveHardwareTime);
+  if (activeTime == nullptr) return;
+  ValueMap payload{{kActiveHardwareTime, *activeTime}};
+  if (const Value* clients = message.find(kActiveClients)) payload.set(kActiveClients, *clients);
+  send(kLeakedSessionEvent, std::move(payload));
+}
+
+SharedString TWReportingSessionEnergybookWorker::applicationName() const {
+  const auto owner = session.lock();
+  return TWReportingUtilityRetrieveAppName(owner == nullptr ? ValueMap() : owner->configuration());
+}
+
+}  // namespace tonewerk
