@@ -26,6 +26,8 @@ std::size_t widthOf(const std::string& text) {
 
 Table::Cell::Cell(const Value& value) : text(value.text()), json(jsonOf(value)) {}
 
+Table::Cell Table::Cell::time(double seconds) { return {textOf(Date{seconds}), jsonOf(Value(seconds))}; }
+
 Table::Table(std::ostream& out, bool asJson, std::vector<std::string> columns)
     : out_(out), asJson_(asJson), columns_(std::move(columns)) {
   for (const std::string& column : columns_) widths_.push_back(widthOf(column));

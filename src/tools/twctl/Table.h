@@ -24,6 +24,8 @@ class Table {
     std::string text;  // for people
     std::string json;  // for programs, a JSON value
     Cell(const Value& value);
+    // Seconds since 1970: RFC 3339 for people, the number for programs.
+    static Cell time(double seconds);
     Cell(std::string shown, std::string written) : text(std::move(shown)), json(std::move(written)) {}
   };
   // As many cells as columns.
