@@ -68,7 +68,7 @@ class CommandLineTest : public testing::Test {
 };
 
 TEST_F(CommandLineTest, HelpsWithEveryCommand) {
-  for (const char* name : {"list", "validate", "send", "replay", "events", "defaults", "kill"}) {
+  for (const char* name : {"list", "validate", "send", "replay", "events", "power", "defaults", "kill"}) {
     EXPECT_EQ(run({name, "--help"}), kDone);
     EXPECT_THAT(output(), HasSubstr("--json")) << name;
     EXPECT_THAT(errors(), IsEmpty());
@@ -100,6 +100,9 @@ TEST_F(CommandLineTest, CallsWrongUsageWrong) {
            {"replay", "/"},
            {"events", "--since", "then"},
            {"events", "--limit", "0"},
+           {"power", "--until", "then"},
+           {"power", "--limit", "0"},
+           {"power", "more"},
            {"defaults"},
            {"defaults", "write", "a.b", "c"}}) {
     EXPECT_EQ(run(wrong), kWrongUsage) << testing::PrintToString(wrong);
@@ -302,6 +305,92 @@ TEST_F(EventsCommandTest, TakesTimes) {
       kDone);
   EXPECT_EQ(output(),
             "{\"id\":4,\"recorded_at\":1763633890.5,\"name\":\"com.orvane.b\",\"payload\":{\"n\":2}}\n");
+}
+
+// With a store that holds an event of another table and six power events, those with a duration on the odd
+// seconds.
+class PowerCommandTest : public CommandLineTest {
+ protected:
+  void store() {
+    MemoryLog log;
+    const LogCategory category(log, "com.orvane.tonewerk", "twrs");
+    const MemoryPreferenceStore preferences;
+    ManualClock clock;
+    ReportStore store(directory_.path("state"), json_, preferences, clock, category);
+    store.recordEvent(1'763'633'880.0, "com.orvane.a", {{"EngineOnDuration", 100}});
+    const auto record = [&](double second, const char* name, ValueMap payload) {
+      store.record(PowerRow{1'763'633'880.0 + second, 28, name, std::move(payload)});
+    };
+    record(1, "Flumen_Haptics_EngineOnDuration", {{"EngineOnDuration", 1.5}, {"ApplicationName", "game"}});
+    record(2, "Flumen_Haptics_ClientStatus", {{"Status", true}, {"ApplicationName", "game"}});
+    record(3, "Flumen_Haptics_EngineOnDuration", {{"EngineOnDuration", 7}, {"ApplicationName", "chat"}});
+    record(5, "Flumen_Haptics_EngineOnDuration", {{"EngineOnDuration", 2}, {"ApplicationName", "game"}});
+    record(7, "Flumen_Haptics_EngineOnDuration", {{"EngineOnDuration", 0.25}});
+    record(8, "LeakedHapticsSessionInfo", {{"Haptic_Active_Hardware_Time_Seconds", 3600}});
+  }
+};
+
+TEST_F(PowerCommandTest, SaysThatThereIsNoStore) {
+  EXPECT_EQ(run({"power"}), kRefused);
+  EXPECT_THAT(errors(), HasSubstr(directory_.path("state/reports.db") + ": there is no such file"));
+}
+
+TEST_F(PowerCommandTest, ShowsEventsAndTheTotalsOfTheirDurationsToPeople) {
+  store();
+  EXPECT_EQ(run({"power", "--limit", "4"}), kDone);
+  EXPECT_EQ(output(),
+            "id  time                  group  name                             payload\n"
+            "3   2025-11-20T10:18:03Z  28     Flumen_Haptics_EngineOnDuration  "
+            "{\"EngineOnDuration\":7,\"ApplicationName\":\"chat\"}\n"
+            "4   2025-11-20T10:18:05Z  28     Flumen_Haptics_EngineOnDuration  "
+            "{\"EngineOnDuration\":2,\"ApplicationName\":\"game\"}\n"
+            "5   2025-11-20T10:18:07Z  28     Flumen_Haptics_EngineOnDuration  {\"EngineOnDuration\":0.25}\n"
+            "6   2025-11-20T10:18:08Z  28     LeakedHapticsSessionInfo         "
+            "{\"Haptic_Active_Hardware_Time_Seconds\":3600}\n"
+            "\n"
+            "ApplicationName  EngineOnDuration  events\n"
+            "chat             7                 1\n"
+            "game             2                 1\n"
+            "(null)           0.25              1\n");
+}
+
+TEST_F(PowerCommandTest, ShowsNoTotalsWhereNoEventHasADuration) {
+  store();
+  EXPECT_EQ(run({"power", "--name", "*Status"}), kDone);
+  EXPECT_EQ(output(),
+            "id  time                  group  name                         payload\n"
+            "2   2025-11-20T10:18:02Z  28     Flumen_Haptics_ClientStatus  "
+            "{\"Status\":true,\"ApplicationName\":\"game\"}\n");
+}
+
+TEST_F(PowerCommandTest, GivesEventsAloneToPrograms) {
+  store();
+  EXPECT_EQ(run({"power", "--json", "--name", "*Duration", "--since", "2025-11-20T10:18:05Z"}), kDone);
+  EXPECT_EQ(output(),
+            "{\"id\":4,\"recorded_at\":1763633885.0,\"event_group\":28,"
+            "\"name\":\"Flumen_Haptics_EngineOnDuration\","
+            "\"payload\":{\"EngineOnDuration\":2,\"ApplicationName\":\"game\"}}\n"
+            "{\"id\":5,\"recorded_at\":1763633887.0,\"event_group\":28,"
+            "\"name\":\"Flumen_Haptics_EngineOnDuration\",\"payload\":{\"EngineOnDuration\":0.25}}\n");
+}
+
+TEST_F(PowerCommandTest, GivesTotalsAloneToPrograms) {
+  store();
+  EXPECT_EQ(run({"power", "--json", "--totals"}), kDone);
+  EXPECT_EQ(output(),
+            "{\"ApplicationName\":\"chat\",\"EngineOnDuration\":7.0,\"events\":1}\n"
+            "{\"ApplicationName\":\"game\",\"EngineOnDuration\":3.5,\"events\":2}\n"
+            "{\"ApplicationName\":null,\"EngineOnDuration\":0.25,\"events\":1}\n");
+}
+
+TEST_F(PowerCommandTest, TotalsKeepToTheFilter) {
+  store();
+  EXPECT_EQ(run({"power", "--totals", "--since", "2025-11-20T10:18:02Z", "--until", "2025-11-20T10:18:05Z"}),
+            kDone);
+  EXPECT_EQ(output(),
+            "ApplicationName  EngineOnDuration  events\n"
+            "chat             7                 1\n"
+            "game             2                 1\n");
 }
 
 TEST_F(CommandLineTest, SetsPreferences) {

@@ -12,6 +12,15 @@ namespace {
 
 constexpr std::chrono::seconds kPatience{5};
 
+// What the queries below say of a filter, as parameters 2 to 6. Parameter 1 is the names of a row.
+std::string conditions(const EventFilter& filter, const std::string& name, const std::string& recordedAt) {
+  std::string sql;
+  if (filter.name) sql += " AND " + name + " GLOB ?3";
+  if (filter.since) sql += " AND " + recordedAt + " >= ?4";
+  if (filter.until) sql += " AND " + recordedAt + " <= ?5";
+  return sql;
+}
+
 // On the tables below the view: there, what comes after an identifier is found by key.
 std::string eventQuery(const EventFilter& filter) {
   std::string sql =
@@ -19,11 +28,24 @@ std::string eventQuery(const EventFilter& filter) {
       "payload"
       " FROM analytics_row AS r CROSS JOIN analytics_name AS n ON n.name_set = r.name_set"
       " WHERE r.id >= ?2 / ?1 AND r.id * ?1 + n.position > ?2";
-  if (filter.name) sql += " AND n.name GLOB ?3";
-  if (filter.since) sql += " AND r.recorded_at >= ?4";
-  if (filter.until) sql += " AND r.recorded_at <= ?5";
+  sql += conditions(filter, "n.name", "r.recorded_at");
   if (!filter.limit) return sql + " ORDER BY r.id, n.position";
   return "SELECT * FROM (" + sql + " ORDER BY r.id DESC, n.position DESC LIMIT ?6) ORDER BY id";
+}
+
+std::string powerQuery(const EventFilter& filter) {
+  const std::string sql =
+      "SELECT id, recorded_at, event_group, name, payload FROM power_event WHERE id > ?2" +
+      conditions(filter, "name", "recorded_at");
+  if (!filter.limit) return sql + " ORDER BY id";
+  return "SELECT * FROM (" + sql + " ORDER BY id DESC LIMIT ?6) ORDER BY id";
+}
+
+std::string engineOnQuery(const EventFilter& filter) {
+  return "SELECT payload ->> 'ApplicationName', sum(payload ->> 'EngineOnDuration') AS duration, count(*)"
+         " FROM (" +
+         powerQuery(filter) +
+         ") WHERE payload ->> 'EngineOnDuration' IS NOT NULL GROUP BY 1 ORDER BY duration DESC, 1";
 }
 
 }  // namespace
@@ -45,7 +67,30 @@ StoreReader::Outcome StoreReader::open(const std::string& directory) {
 
 bool StoreReader::readEvents(const EventFilter& filter,
                              const std::function<void(const StoredEvent& event)>& take) {
-  SqliteStatement select = database_.prepare(eventQuery(filter));
+  return readRows(eventQuery(filter), filter, [&](const SqliteStatement& row) {
+    take({row.integer(0), row.number(1), row.text(2), row.text(3)});
+  });
+}
+
+bool StoreReader::readPowerEvents(const EventFilter& filter,
+                                  const std::function<void(const StoredPowerEvent& event)>& take) {
+  return readRows(powerQuery(filter), filter, [&](const SqliteStatement& row) {
+    take({row.integer(0), row.number(1), row.integer(2), row.text(3), row.text(4)});
+  });
+}
+
+bool StoreReader::readEngineOnTotals(const EventFilter& filter,
+                                     const std::function<void(const EngineOnTotal& total)>& take) {
+  return readRows(engineOnQuery(filter), filter, [&](const SqliteStatement& row) {
+    EngineOnTotal total{std::nullopt, row.number(1), row.integer(2)};
+    if (!row.isNull(0)) total.application = row.text(0);
+    take(total);
+  });
+}
+
+bool StoreReader::readRows(const std::string& sql, const EventFilter& filter,
+                           const std::function<void(const SqliteStatement& row)>& take) {
+  SqliteStatement select = database_.prepare(sql);
   select.bind(1, kStoreNamesPerRow);
   select.bind(2, filter.afterId);
   if (filter.name) select.bind(3, std::string_view(*filter.name));
@@ -55,7 +100,7 @@ bool StoreReader::readEvents(const EventFilter& filter,
   for (;;) {
     switch (select.step()) {
       case SqliteStatement::Step::kRow:
-        take({select.integer(0), select.number(1), select.text(2), select.text(3)});
+        take(select);
         break;
       case SqliteStatement::Step::kDone:
         return true;

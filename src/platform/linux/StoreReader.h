@@ -18,6 +18,22 @@ struct StoredEvent {
   std::string payload;  // JSON
 };
 
+// One event of the power log, likewise.
+struct StoredPowerEvent {
+  std::int64_t id = 0;
+  double recordedAt = 0.0;
+  std::int64_t group = 0;
+  std::string name;
+  std::string payload;
+};
+
+// For how long one application had the haptics engine on, in whatever unit it reports that.
+struct EngineOnTotal {
+  std::optional<std::string> application;  // none for those whose name is not known
+  double duration = 0.0;
+  std::int64_t events = 0;
+};
+
 struct EventFilter {
   std::optional<std::string> name;  // a pattern with *, ? and [...]
   std::optional<double> since;      // seconds since 1970, inclusive
@@ -37,12 +53,21 @@ class StoreReader {
   // Every event that passes, oldest first. False on failure.
   bool readEvents(const EventFilter& filter, const std::function<void(const StoredEvent& event)>& take);
 
+  bool readPowerEvents(const EventFilter& filter,
+                       const std::function<void(const StoredPowerEvent& event)>& take);
+  // Of the power events that pass, the application with the longest time first.
+  bool readEngineOnTotals(const EventFilter& filter,
+                          const std::function<void(const EngineOnTotal& total)>& take);
+
   // Whether another file has taken the place of the one opened.
   bool hasMoved() const { return database_.hasMoved(); }
   // What the last failure was, with the file's path.
   const std::string& problem() const { return problem_; }
 
  private:
+  // Runs `take` at each row of a query with the filter's parameters.
+  bool readRows(const std::string& sql, const EventFilter& filter,
+                const std::function<void(const SqliteStatement& row)>& take);
   Outcome openAs(SqliteDatabase::Mode mode);
   Outcome fail(const std::string& problem);
 

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/StoreReader.h"
 
+#include <cmath>
 #include <filesystem>
 #include <fstream>
 #include <gmock/gmock.h>
@@ -135,6 +136,25 @@ TEST_F(StoreReaderTest, SplitsTheTwoNamesOfARowBetweenTwoReads) {
   std::vector<std::string> names;
   ASSERT_TRUE(reader_.readEvents(next, [&](const StoredEvent& event) { names.push_back(event.name); }));
   EXPECT_THAT(names, ElementsAre("second"));
+}
+
+TEST_F(StoreReaderTest, SumsDurationsOfWhateverKind) {
+  openStore();
+  record("a");
+  for (const Value& duration : {Value(2), Value(0.5), Value("1.5 s"), Value(true), Value(ValueArray{9}),
+                                Value(std::nan(""))}) {  // the last is stored as null and counts as none
+    store_->record(PowerRow{clock_.now(), 28, "x", {{"EngineOnDuration", duration}, {"ApplicationName", 7}}});
+  }
+  store_->record(PowerRow{clock_.now(), 28, "x", {{"ApplicationName", "nobody"}}});
+  ASSERT_TRUE(store_->flush(std::chrono::seconds(30)));
+  ASSERT_EQ(open(), StoreReader::Outcome::kDone);
+  std::vector<EngineOnTotal> totals;
+  ASSERT_TRUE(reader_.readEngineOnTotals({}, [&](const EngineOnTotal& total) { totals.push_back(total); }))
+      << reader_.problem();
+  ASSERT_EQ(totals.size(), 1U);
+  EXPECT_EQ(totals[0].application, "7");
+  EXPECT_EQ(totals[0].duration, 5.0);
+  EXPECT_EQ(totals[0].events, 5);
 }
 
 TEST_F(StoreReaderTest, NoticesThatTheFileHasGone) {
