@@ -7,6 +7,7 @@ namespace tonewerk {
 
 class Clock;
 class DeviceFacts;
+class Diagwire;
 class Energybook;
 class FileSystem;
 class JsonService;
@@ -34,6 +35,7 @@ struct Platform {
   JsonService& json;
   Metricon& metricon;
   Energybook& energybook;
+  Diagwire& diagwire;
   // Where reports for people go; absolute.
   std::string logsDirectory = {};
 };

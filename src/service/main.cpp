@@ -19,6 +19,7 @@
 #include "platform/linux/LinuxPlatform.h"
 #include "platform/linux/ReportStore.h"
 #include "platform/linux/ServerSocket.h"
+#include "platform/linux/StoreDiagwire.h"
 #include "platform/linux/StoreEnergybook.h"
 #include "platform/linux/StoreMetricon.h"
 #include "platform/linux/UnixSocketListener.h"
@@ -56,6 +57,7 @@ class Daemon {
       : store_(directories.state, linux.json(), linux.preferences(), linux.clock(), log),
         metricon_(store_, linux.preferences(), linux.clock(), log),
         energybook_(store_, linux.clock()),
+        diagwire_(store_, linux.clock()),
         context_(platformOf(linux, directories), allWorkerClasses()),
         service_(TWReportingService::make([this] { endOnKillRequest(); })),
         listener_(std::move(socket), log) {
@@ -74,7 +76,7 @@ class Daemon {
 
  private:
   Platform platformOf(LinuxPlatform& linux, const Directories& directories) {
-    Platform platform = linux.platform(metricon_, energybook_);
+    Platform platform = linux.platform(metricon_, energybook_, diagwire_);
     platform.logsDirectory = directories.logs;
     return platform;
   }
@@ -93,6 +95,7 @@ class Daemon {
   ReportStore store_;
   StoreMetricon metricon_;
   StoreEnergybook energybook_;
+  StoreDiagwire diagwire_;
   TWReportingContext context_;
   std::shared_ptr<TWReportingService> service_;
   UnixSocketListener listener_;

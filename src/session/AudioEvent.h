@@ -25,6 +25,7 @@ inline constexpr AudioEventType kTypeGeneric = 0;
 inline constexpr AudioEventType kTypeStart = 1;
 inline constexpr AudioEventType kTypeStop = 2;
 inline constexpr AudioEventType kTypeError = 6;
+inline constexpr AudioEventType kTypeIssueDetector = 7;
 inline constexpr AudioEventType kTypeEnergybook = 8;
 inline constexpr AudioEventType kTypeSummary = 11;
 inline constexpr AudioEventType kTypeUnknown = 65535;

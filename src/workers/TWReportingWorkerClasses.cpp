@@ -4,6 +4,7 @@
 #include "workers/producers/TWReportingSessionGatherMessagesWorker.h"
 #include "workers/producers/TWReportingSessionInputMessagesWorker.h"
 #include "workers/producers/TWReportingSessionVolumeMessagesWorker.h"
+#include "workers/sinks/TWReportingSessionDiagwireWorker.h"
 #include "workers/sinks/TWReportingSessionEnergybookWorker.h"
 #include "workers/sinks/TWReportingSessionMetriconWorker.h"
 #include "workers/sinks/TWReportingSessionSummaryJsonFileWorker.h"
@@ -21,6 +22,7 @@ std::vector<const TWReportingSessionWorkerClass*> allWorkerClasses() {
       &TWReportingSessionInputMessagesWorker::kWorkerClass,
       &TWReportingSessionMetriconWorker::kWorkerClass,
       &TWReportingSessionEnergybookWorker::kWorkerClass,
+      &TWReportingSessionDiagwireWorker::kWorkerClass,
       &TWReportingSessionSummaryJsonFileWorker::kWorkerClass,
   };
 }

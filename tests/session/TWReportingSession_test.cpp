@@ -488,7 +488,7 @@ TEST_F(WorkerTest, TheDaemonsClassesComeInTheRegistrysOrder) {
               ElementsAre("TWReportingSessionVolumeMessagesWorker", "TWReportingSessionGatherMessagesWorker",
                           "TWReportingSessionSummaryWorker", "TWReportingSessionInputMessagesWorker",
                           "TWReportingSessionMetriconWorker", "TWReportingSessionEnergybookWorker",
-                          "TWReportingSessionSummaryJsonFileWorker"));
+                          "TWReportingSessionDiagwireWorker", "TWReportingSessionSummaryJsonFileWorker"));
 }
 
 TEST_F(WorkerTest, TheRegistryIsFilledOnce) {

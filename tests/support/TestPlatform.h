@@ -6,6 +6,7 @@
 #include "support/ManualQueues.h"
 #include "support/ManualTimers.h"
 #include "support/MemoryDeviceFacts.h"
+#include "support/MemoryDiagwire.h"
 #include "support/MemoryEnergybook.h"
 #include "support/MemoryFileSystem.h"
 #include "support/MemoryJsonService.h"
@@ -32,8 +33,8 @@ struct TestPlatform {
   TestPlatform& operator=(const TestPlatform&) = delete;
 
   Platform platform() {
-    return {log,         tracePoints, clock, queues, timers,   processes,  system,
-            deviceFacts, preferences, files, json,   metricon, energybook, "/logs"};
+    return {log,         tracePoints, clock, queues,   timers,     processes, system, deviceFacts,
+            preferences, files,       json,  metricon, energybook, diagwire,  "/logs"};
   }
 
   MemoryLog log;
@@ -49,6 +50,7 @@ struct TestPlatform {
   MemoryJsonService json;
   MemoryMetricon metricon;
   MemoryEnergybook energybook;
+  MemoryDiagwire diagwire;
 };
 
 }  // namespace tonewerk

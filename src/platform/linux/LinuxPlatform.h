@@ -28,8 +28,8 @@ class LinuxPlatform {
   PreferenceStore& preferences();
   JsonService& json();
 
-  // `metricon` and `energybook` outlive what uses the result.
-  Platform platform(Metricon& metricon, Energybook& energybook);
+  // The reporting services outlive what uses the result.
+  Platform platform(Metricon& metricon, Energybook& energybook, Diagwire& diagwire);
 
  private:
   struct Adapters;

@@ -8,6 +8,7 @@
 #include "platform/DeviceFacts.h"
 #include "platform/PreferenceStore.h"
 #include "platform/linux/Directories.h"
+#include "support/MemoryDiagwire.h"
 #include "support/MemoryEnergybook.h"
 #include "support/MemoryMetricon.h"
 #include "support/TemporaryDirectory.h"
@@ -25,7 +26,8 @@ TEST(LinuxPlatformTest, LooksForEverythingWhereTheDirectoriesSay) {
   LinuxPlatform linuxPlatform(directories);
   MemoryMetricon metricon;
   MemoryEnergybook energybook;
-  const Platform platform = linuxPlatform.platform(metricon, energybook);
+  MemoryDiagwire diagwire;
+  const Platform platform = linuxPlatform.platform(metricon, energybook, diagwire);
   EXPECT_EQ(platform.deviceFacts.boolean("InternalBuild"), true);
   EXPECT_EQ(platform.preferences.read("com.orvane.test", "a"), Value(1));
   EXPECT_FALSE(platform.preferences.write("com.orvane.test", "b", 2));
@@ -33,6 +35,7 @@ TEST(LinuxPlatformTest, LooksForEverythingWhereTheDirectoriesSay) {
   EXPECT_EQ(platform.logsDirectory, root.path("logs"));
   EXPECT_EQ(&platform.metricon, &metricon);
   EXPECT_EQ(&platform.energybook, &energybook);
+  EXPECT_EQ(&platform.diagwire, &diagwire);
 }
 
 }  // namespace

@@ -1,0 +1,23 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Reads the input as a metric record; what was read must read back the same.
+#include <cstddef>
+#include <cstdint>
+#include <cstdlib>
+#include <string_view>
+
+#include "platform/linux/ProtozeroReader.h"
+#include "platform/linux/ProtozeroWriter.h"
+#include "workers/sinks/AudioIssueDetected.h"
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+  tonewerk::ProtozeroReader reader(std::string_view(reinterpret_cast<const char*>(data), size));
+  tonewerk::diagwiremetrics::AudioIssueDetected record;
+  record.readFrom(reader);
+  tonewerk::ProtozeroWriter writer;
+  record.writeTo(writer);
+  tonewerk::ProtozeroReader again(writer.bytes());
+  tonewerk::diagwiremetrics::AudioIssueDetected copy;
+  if (!copy.readFrom(again) || !(copy == record)) std::abort();
+  return 0;
+}

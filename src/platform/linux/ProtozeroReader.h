@@ -1,0 +1,35 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <string_view>
+
+#include "platform/pb/Reader.h"
+
+namespace tonewerk {
+
+// Reads protocol-buffer bytes. Fit for hostile input: nothing is allocated on a length's word, groups are
+// skipped to kMostGroups deep.
+class ProtozeroReader final : public PB::Reader {
+ public:
+  static constexpr int kMostGroups = 32;
+
+  // `bytes` outlives the reader.
+  explicit ProtozeroReader(std::string_view bytes) : at_(bytes.data()), end_(bytes.data() + bytes.size()) {}
+
+  std::optional<Key> nextKey() override;
+  std::optional<std::uint64_t> readVarint() override;
+  std::optional<std::string> readBytes() override;
+  bool skip(const Key& key) override;
+  bool hasError() const override { return hasError_; }
+
+ private:
+  bool skip(const Key& key, int groups);
+  bool skipBytes(std::uint64_t count);
+  bool fail();
+
+  const char* at_;
+  const char* end_;
+  bool hasError_ = false;
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,35 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <vector>
+
+#include "platform/pb/TextFormatter.h"
+#include "values/Value.h"
+
+namespace tonewerk {
+
+// A record as a map, an object within it as a map under its name. A byte string that is not UTF-8 shows its
+// bytes above 0x7F as "\xNN".
+class ValueMapFormatter final : public PB::TextFormatter {
+ public:
+  void beginObject(std::string_view name) override;
+  void format(std::string_view name, std::uint64_t value) override;
+  void format(std::string_view name, std::string_view value) override;
+  void endObject() override;
+
+  // What was formatted: the outermost objects under their names.
+  const ValueMap& map() const { return map_; }
+
+ private:
+  struct Open {
+    SharedString name;
+    ValueMap map;
+  };
+
+  ValueMap& current() { return open_.empty() ? map_ : open_.back().map; }
+
+  ValueMap map_;
+  std::vector<Open> open_;
+};
+
+}  // namespace tonewerk

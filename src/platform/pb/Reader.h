@@ -1,0 +1,36 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <string>
+
+#include "platform/pb/WireType.h"
+
+namespace tonewerk::PB {
+
+// Reads protocol-buffer fields one after the other. After an error nothing more is read: every later call
+// fails.
+class Reader {
+ public:
+  struct Key {
+    std::uint32_t tag;
+    WireType type;
+  };
+
+  virtual ~Reader() = default;
+
+  // None at the end of the input and on an error.
+  virtual std::optional<Key> nextKey() = 0;
+
+  // The value behind the key that was read last; each fails when the input ends within it. A varint has at
+  // most ten bytes.
+  virtual std::optional<std::uint64_t> readVarint() = 0;
+  virtual std::optional<std::string> readBytes() = 0;
+  // A group is skipped up to its end.
+  virtual bool skip(const Key& key) = 0;
+
+  virtual bool hasError() const = 0;
+};
+
+}  // namespace tonewerk::PB

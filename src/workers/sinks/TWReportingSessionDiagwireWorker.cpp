@@ -1,0 +1,48 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "workers/sinks/TWReportingSessionDiagwireWorker.h"
+
+#include <string>
+#include <string_view>
+
+#include "platform/Diagwire.h"
+#include "platform/LogLine.h"
+#include "session/TWReportingContext.h"
+#include "session/TWReportingSessionMessage.h"
+#include "session/TWReportingUtility.h"
+#include "workers/sinks/AudioIssueDetected.h"
+
+namespace tonewerk {
+namespace {
+
+// Null, and logged, when the message lacks the key.
+const Value* valueOf(const ValueMap& message, std::string_view key) {
+  const Value* value = message.find(key);
+  if (value == nullptr)
+    errorLog(TWReportingDiagwireLogCategory(), "Failed to get %@ for AudioIssueDetected", key);
+  return value;
+}
+
+// The record's fields end at a zero byte, as C strings do.
+void setBytes(std::string& field, const ValueMap& message, std::string_view key) {
+  if (const Value* value = valueOf(message, key)) field = value->text().c_str();
+}
+
+}  // namespace
+
+const TWReportingSessionWorkerClass TWReportingSessionDiagwireWorker::kWorkerClass =
+    workerClassOf<TWReportingSessionDiagwireWorker>("TWReportingSessionDiagwireWorker");
+
+bool TWReportingSessionDiagwireWorker::handleMessage(const TWReportingSessionMessage& message) {
+  if (message.type != kTypeIssueDetector) return false;
+  diagwiremetrics::AudioIssueDetected record;
+  setBytes(record.issuetype, message.message, "issue_type");
+  setBytes(record.rtaidclient, message.message, "rtaid_client");
+  setBytes(record.node, message.message, "node");
+  if (const Value* silence = valueOf(message.message, "any_channel_silence_seconds")) {
+    record.duration = static_cast<std::uint32_t>(silence->integer32());
+  }
+  TWReportingContext::current().platform().diagwire.post(record.kMetricIdentifier, record);
+  return false;
+}
+
+}  // namespace tonewerk
