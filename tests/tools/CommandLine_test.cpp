@@ -68,7 +68,8 @@ class CommandLineTest : public testing::Test {
 };
 
 TEST_F(CommandLineTest, HelpsWithEveryCommand) {
-  for (const char* name : {"list", "validate", "send", "replay", "events", "power", "defaults", "kill"}) {
+  for (const char* name :
+       {"list", "validate", "send", "replay", "events", "metrics", "power", "defaults", "kill"}) {
     EXPECT_EQ(run({name, "--help"}), kDone);
     EXPECT_THAT(output(), HasSubstr("--json")) << name;
     EXPECT_THAT(errors(), IsEmpty());
@@ -102,6 +103,8 @@ TEST_F(CommandLineTest, CallsWrongUsageWrong) {
            {"events", "--limit", "0"},
            {"power", "--until", "then"},
            {"power", "--limit", "0"},
+           {"metrics", "--name", "a"},
+           {"metrics", "--since", "then"},
            {"power", "more"},
            {"defaults"},
            {"defaults", "write", "a.b", "c"}}) {
@@ -305,6 +308,57 @@ TEST_F(EventsCommandTest, TakesTimes) {
       kDone);
   EXPECT_EQ(output(),
             "{\"id\":4,\"recorded_at\":1763633890.5,\"name\":\"com.orvane.b\",\"payload\":{\"n\":2}}\n");
+}
+
+// With a store that holds a power event and three metric records, the second of a kind that nobody knows and
+// the third damaged.
+class MetricsCommandTest : public CommandLineTest {
+ protected:
+  void store() {
+    MemoryLog log;
+    const LogCategory category(log, "com.orvane.tonewerk", "twrs");
+    const MemoryPreferenceStore preferences;
+    ManualClock clock;
+    ReportStore store(directory_.path("state"), json_, preferences, clock, category);
+    const auto record = [&](double second, std::uint32_t identifier, std::string bytes) {
+      store.record(MetricRow{1'763'633'880.0 + second, identifier, std::move(bytes)});
+    };
+    record(1, 0x5B0003, std::string("\x10\x03\x1a\x07silence\x22\x05mixer\x2a\x00", 20));
+    store.record(PowerRow{1'763'633'882.0, 28, "LeakedHapticsSessionInfo", {}});
+    record(3, 7, std::string("\x10\x03", 2));
+    record(4, 0x5B0003, "\x1a\x09");
+  }
+};
+
+TEST_F(MetricsCommandTest, SaysThatThereIsNoStore) {
+  EXPECT_EQ(run({"metrics"}), kRefused);
+  EXPECT_THAT(errors(), HasSubstr(directory_.path("state/reports.db") + ": there is no such file"));
+}
+
+TEST_F(MetricsCommandTest, ShowsRecordsDecodedAndOthersInHexadecimal) {
+  store();
+  EXPECT_EQ(run({"metrics"}), kDone);
+  EXPECT_EQ(output(),
+            "id  time                  identifier  record\n"
+            "1   2025-11-20T10:18:01Z  5963779     "
+            "{\"duration\":3,\"issuetype\":\"silence\",\"node\":\"mixer\",\"rtaidclient\":\"\"}\n"
+            "2   2025-11-20T10:18:03Z  7           1003\n"
+            "3   2025-11-20T10:18:04Z  5963779     1a09\n");
+}
+
+TEST_F(MetricsCommandTest, GivesRecordsToProgramsByTheFilter) {
+  store();
+  EXPECT_EQ(run({"metrics", "--json", "--until", "2025-11-20T10:18:03Z"}), kDone);
+  EXPECT_EQ(output(),
+            "{\"id\":1,\"posted_at\":1763633881.0,\"identifier\":5963779,"
+            "\"record\":{\"duration\":3,\"issuetype\":\"silence\",\"node\":\"mixer\",\"rtaidclient\":\"\"}}\n"
+            "{\"id\":2,\"posted_at\":1763633883.0,\"identifier\":7,\"record\":\"1003\"}\n");
+}
+
+TEST_F(MetricsCommandTest, TheLimitTakesTheNewest) {
+  store();
+  EXPECT_EQ(run({"metrics", "--json", "--limit", "1"}), kDone);
+  EXPECT_THAT(output(), HasSubstr("{\"id\":3,"));
 }
 
 // With a store that holds an event of another table and six power events, those with a duration on the odd

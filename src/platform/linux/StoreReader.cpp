@@ -41,6 +41,15 @@ std::string powerQuery(const EventFilter& filter) {
   return "SELECT * FROM (" + sql + " ORDER BY id DESC LIMIT ?6) ORDER BY id";
 }
 
+std::string metricQuery(const EventFilter& filter) {
+  EventFilter unnamed = filter;
+  unnamed.name.reset();
+  const std::string sql = "SELECT id, posted_at, identifier, record FROM metric WHERE id > ?2" +
+                          conditions(unnamed, "", "posted_at");
+  if (!filter.limit) return sql + " ORDER BY id";
+  return "SELECT * FROM (" + sql + " ORDER BY id DESC LIMIT ?6) ORDER BY id";
+}
+
 std::string engineOnQuery(const EventFilter& filter) {
   return "SELECT payload ->> 'ApplicationName', sum(payload ->> 'EngineOnDuration') AS duration, count(*)"
          " FROM (" +
@@ -85,6 +94,13 @@ bool StoreReader::readEngineOnTotals(const EventFilter& filter,
     EngineOnTotal total{std::nullopt, row.number(1), row.integer(2)};
     if (!row.isNull(0)) total.application = row.text(0);
     take(total);
+  });
+}
+
+bool StoreReader::readMetrics(const EventFilter& filter,
+                              const std::function<void(const StoredMetric& metric)>& take) {
+  return readRows(metricQuery(filter), filter, [&](const SqliteStatement& row) {
+    take({row.integer(0), row.number(1), row.integer(2), row.bytes(3)});
   });
 }
 

@@ -34,6 +34,14 @@ struct EngineOnTotal {
   std::int64_t events = 0;
 };
 
+// One metric record.
+struct StoredMetric {
+  std::int64_t id = 0;
+  double postedAt = 0.0;
+  std::int64_t identifier = 0;
+  std::string record;  // bytes
+};
+
 struct EventFilter {
   std::optional<std::string> name;  // a pattern with *, ? and [...]
   std::optional<double> since;      // seconds since 1970, inclusive
@@ -58,6 +66,9 @@ class StoreReader {
   // Of the power events that pass, the application with the longest time first.
   bool readEngineOnTotals(const EventFilter& filter,
                           const std::function<void(const EngineOnTotal& total)>& take);
+
+  // Metrics have no name to choose by.
+  bool readMetrics(const EventFilter& filter, const std::function<void(const StoredMetric& metric)>& take);
 
   // Whether another file has taken the place of the one opened.
   bool hasMoved() const { return database_.hasMoved(); }

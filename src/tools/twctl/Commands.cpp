@@ -30,6 +30,7 @@ int runCommandLine(int argc, const char* const* argv, Tool& tool) {
   addSendCommand(app, tool);
   addReplayCommand(app, tool);
   addEventsCommand(app, tool);
+  addMetricsCommand(app, tool);
   addPowerCommand(app, tool);
   addDefaultsCommand(app, tool);
   addKillCommand(app, tool);

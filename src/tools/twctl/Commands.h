@@ -18,6 +18,7 @@ void addValidateCommand(CLI::App& app, Tool& tool);
 void addSendCommand(CLI::App& app, Tool& tool);
 void addReplayCommand(CLI::App& app, Tool& tool);
 void addEventsCommand(CLI::App& app, Tool& tool);
+void addMetricsCommand(CLI::App& app, Tool& tool);
 void addPowerCommand(CLI::App& app, Tool& tool);
 void addDefaultsCommand(CLI::App& app, Tool& tool);
 void addKillCommand(CLI::App& app, Tool& tool);

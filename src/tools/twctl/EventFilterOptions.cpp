@@ -27,10 +27,14 @@ bool readTime(Tool& tool, const char* option, const std::optional<std::string>& 
 }  // namespace
 
 void EventFilterOptions::addTo(CLI::App& command) {
+  command.add_option("--name", name_, "Only names that this pattern fits (*, ?, [...])");
+  addWithoutNameTo(command);
+}
+
+void EventFilterOptions::addWithoutNameTo(CLI::App& command) {
   command.footer(
       "A time is as 2026-11-20T10:18:00Z, or how long ago: 90s, 10m, 1.5h, 2d. The store is read whether a\n"
       "daemon runs or not.");
-  command.add_option("--name", name_, "Only names that this pattern fits (*, ?, [...])");
   command.add_option("--since", since_, "Only events from this time on");
   command.add_option("--until", until_, "Only events up to this time");
   command.add_option("--limit", limit_, "Only the newest so many")

@@ -18,8 +18,10 @@ struct Tool;
 // The options by which commands choose among stored events: --name, --since, --until and --limit.
 class EventFilterOptions {
  public:
-  // Declares them for `command`, whose footer says how times are written. The object outlives it.
+  // Declares them for `command`, whose footer says how times are written. The object outlives it. What has no
+  // name gets no --name.
   void addTo(CLI::App& command);
+  void addWithoutNameTo(CLI::App& command);
 
   // What they say. None when one is wrong; `tool` has then said so.
   std::optional<EventFilter> filter(Tool& tool) const;
