@@ -71,11 +71,13 @@ class TwctlTest : public RunningDaemonTest {
 
 TEST_F(TwctlTest, EveryCommandHelps) {
   EXPECT_EQ(run({"--help"}), kDone);
-  for (const std::string name : {"list", "validate", "send", "replay", "events", "defaults", "kill"}) {
+  for (const std::string name :
+       {"list", "validate", "send", "replay", "events", "power", "defaults", "kill"}) {
     SCOPED_TRACE(name);
     EXPECT_THAT(output, HasSubstr("\n  " + name + " "));
   }
-  for (const std::string name : {"list", "validate", "send", "replay", "events", "defaults", "kill"}) {
+  for (const std::string name :
+       {"list", "validate", "send", "replay", "events", "power", "defaults", "kill"}) {
     SCOPED_TRACE(name);
     EXPECT_EQ(run({name, "--help"}), kDone);
     EXPECT_THAT(output, AllOf(HasSubstr("Usage: twctl " + name), HasSubstr("--json")));
@@ -166,6 +168,24 @@ TEST_F(TwctlTest, AMessageReachesTheSessionsNamedOrElseAllStarted) {
             json::parse(R"([1, {"a": true}])"));
   EXPECT_THAT(RecordedEvents(daemon.storePath()).named("com.orvane.haptics.HAL_Playback.Activate"),
               IsEmpty());
+}
+
+TEST_F(TwctlTest, WhatTheHapticsEngineReportsIsInThePowerLog) {
+  DaemonClient client = connect();
+  client.create(kSession, 3);
+  ASSERT_EQ(run({"send", "--id", "77", "--category", "Generic", "--type", "Energybook", "EngineOnTime=2.5",
+                 "EngineState=EngineOn"}),
+            kDone);
+  ASSERT_TRUE(waitUntil([&] { return run({"power", "--json"}) == kDone && objects(output).size() == 2; }));
+  const std::vector<json> events = objects(output);
+  EXPECT_EQ(events[0].at("event_group"), 28);
+  EXPECT_EQ(events[0].at("name"), "Flumen_Haptics_EngineOnDuration");
+  EXPECT_EQ(events[0].at("payload").at("EngineOnDuration"), 2.5);
+  EXPECT_EQ(events[1].at("name"), "Flumen_Haptics_ClientStatus");
+  EXPECT_EQ(events[1].at("payload").at("Status"), true);
+  EXPECT_EQ(run({"power", "--totals", "--json"}), kDone);
+  EXPECT_THAT(objects(output),
+              ElementsAre(json{{"ApplicationName", nullptr}, {"EngineOnDuration", 2.5}, {"events", 1}}));
 }
 
 TEST_F(TwctlTest, AMessageThatNoFrameCarriesIsRefused) {
