@@ -139,7 +139,7 @@ class TomlWriter {
     }
     const double whole = std::floor(date.seconds);
     const long long nanoseconds = std::min(std::llround((date.seconds - whole) * 1e9), 999'999'999LL);
-    std::array<char, 16> fraction{};
+    std::array<char, 24> fraction{};  // any long long: the compiler does not see the bounds
     std::snprintf(fraction.data(), fraction.size(), ".%09lldZ", nanoseconds);
     text_ += textOf(Date{whole});
     if (nanoseconds == 0) return;
