@@ -20,7 +20,7 @@ namespace tonewerk {
 namespace {
 
 constexpr std::chrono::milliseconds kStep{20};
-constexpr std::chrono::seconds kPatience{20};
+constexpr std::chrono::seconds kPatience{60};
 
 // Longer than the store gathers a batch.
 constexpr int kIdleSteps = 15;
