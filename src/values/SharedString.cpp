@@ -25,6 +25,28 @@ std::uint64_t mix(std::uint64_t a, std::uint64_t b) {
   return static_cast<std::uint64_t>(product) ^ static_cast<std::uint64_t>(product >> 64);
 }
 
+std::uint64_t wordAt(const char* at) {
+  std::uint64_t word = 0;
+  std::memcpy(&word, at, sizeof(word));
+  return word;
+}
+
+// The text's last `count` bytes, 0 to 8, as one number. Sizes that are known make each copy one instruction.
+std::uint64_t lastWord(std::string_view text, std::size_t count) {
+  const char* end = text.data() + text.size();
+  if (text.size() >= sizeof(std::uint64_t)) return wordAt(end - sizeof(std::uint64_t));  // some bytes twice
+  if (count >= sizeof(std::uint32_t)) {
+    std::uint32_t first = 0;
+    std::uint32_t last = 0;
+    std::memcpy(&first, end - count, sizeof(first));
+    std::memcpy(&last, end - sizeof(last), sizeof(last));
+    return (std::uint64_t{first} << 32) | last;
+  }
+  std::uint64_t word = 0;
+  for (; count > 0; --count) word = (word << 8) | static_cast<unsigned char>(*(end - count));
+  return word;
+}
+
 }  // namespace
 
 std::size_t SharedString::hashOf(std::string_view text) {
@@ -33,15 +55,10 @@ std::size_t SharedString::hashOf(std::string_view text) {
   std::uint64_t hash = mix(seed ^ text.size(), kOdd);
   const char* at = text.data();
   std::size_t left = text.size();
-  while (left > 0) {
-    std::uint64_t word = 0;
-    const std::size_t take = left < sizeof(word) ? left : sizeof(word);
-    std::memcpy(&word, at, take);
-    hash = mix(hash ^ word, seed | kOdd);
-    at += take;
-    left -= take;
+  for (; left > sizeof(std::uint64_t); at += sizeof(std::uint64_t), left -= sizeof(std::uint64_t)) {
+    hash = mix(hash ^ wordAt(at), seed | kOdd);
   }
-  return static_cast<std::size_t>(hash);
+  return static_cast<std::size_t>(mix(hash ^ lastWord(text, left), seed | kOdd));
 }
 
 SharedString::SharedString(std::string_view text) {

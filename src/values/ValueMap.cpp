@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <bit>
+#include <cassert>
 #include <cstdint>
 #include <utility>
 #include <vector>
@@ -56,6 +57,16 @@ struct ValueMap::Rep {
       if (entry.key.hash() == hash && entry.key.view() == key) return &entry;
     }
     return nullptr;
+  }
+
+  // A text that stays the same is not touched: its count is shared with other threads.
+  void replace(Entry& entry, const Value& value) {
+    const SharedString* before = entry.value.asString();
+    const SharedString* after = value.asString();
+    if (before != nullptr && after != nullptr && before->sharesStorageWith(*after)) return;
+    bytes += value.bytes();
+    bytes -= entry.value.bytes();
+    entry.value = value;
   }
 
   void append(Entry entry) {
@@ -133,6 +144,12 @@ void ValueMap::set(SharedString key, Value value) {
   rep.append(Entry{std::move(key), std::move(value)});
 }
 
+void ValueMap::add(SharedString key, Value value) {
+  Rep& rep = rep_.write();
+  assert(rep.find(key) == nullptr);
+  rep.append(Entry{std::move(key), std::move(value)});
+}
+
 bool ValueMap::erase(std::string_view key) {
   if (!contains(key)) return false;
   Rep& rep = rep_.write();
@@ -153,7 +170,19 @@ void ValueMap::merge(const ValueMap& other) {
     return;
   }
   if (sharesStorageWith(other)) return;
-  for (const Entry& entry : other) set(entry.key, entry.value);
+  Rep& rep = rep_.write();
+  std::size_t guess = 0;  // maps that are merged again and again mostly list their keys in one order
+  for (const Entry& entry : other) {
+    const bool guessed = guess < rep.entries.size() && rep.entries[guess].key.sharesStorageWith(entry.key);
+    Entry* own = guessed ? &rep.entries[guess] : rep.find(entry.key);
+    if (own != nullptr) {
+      guess = static_cast<std::size_t>(own - rep.entries.data()) + 1;
+      rep.replace(*own, entry.value);
+    } else {
+      rep.append(entry);
+      guess = rep.entries.size();
+    }
+  }
 }
 
 void ValueMap::reserve(std::size_t count) {
@@ -169,31 +198,29 @@ bool operator==(const ValueMap& a, const ValueMap& b) { return a.equalsIgnoring(
 
 bool ValueMap::equalsIgnoring(const ValueMap& other, std::initializer_list<std::string_view> ignored) const {
   if (sharesStorageWith(other)) return true;
-  std::size_t left = other.size();
-  std::size_t right = size();
-  for (std::string_view key : ignored) {
-    if (other.contains(key)) --left;
-    if (contains(key)) --right;
-  }
-  if (left != right) return false;
-
   const auto isIgnored = [&](std::string_view key) {
     return std::find(ignored.begin(), ignored.end(), key) != ignored.end();
   };
   const Entry* guess = other.begin();  // messages of one kind mostly list their keys in one order
+  std::size_t common = 0;              // keys that both have, ignored ones included
   for (const Entry& entry : *this) {
     const bool guessed = guess != other.end() && guess->key == entry.key;
-    if (!isIgnored(entry.key)) {
-      const Value* value = guessed ? &guess->value : other.find(entry.key);
-      if (value == nullptr || !(*value == entry.value)) return false;
-    }
+    const Value* value = guessed ? &guess->value : other.find(entry.key);
     if (guess != other.end()) ++guess;
+    if (value != nullptr) ++common;
+    const bool isEqual = value != nullptr && *value == entry.value;
+    if (!isEqual && !isIgnored(entry.key)) return false;
   }
-  return true;
+  if (common == other.size()) return true;
+  const auto onlyInOther = std::count_if(ignored.begin(), ignored.end(), [&](std::string_view key) {
+    return other.contains(key) && !contains(key);
+  });
+  return common + static_cast<std::size_t>(onlyInOther) == other.size();
 }
 
 std::string ValueMap::text() const {
   std::string out;
+  out.reserve(bytes());  // mostly enough: what a value holds is seldom shorter than its text
   appendCompactJson(out, *this);
   return out;
 }

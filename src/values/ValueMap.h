@@ -56,6 +56,8 @@ class ValueMap {
   std::string text(std::string_view key) const;
 
   void set(SharedString key, Value value);
+  // The same for a key that is known not to be there, without looking for it.
+  void add(SharedString key, Value value);
   // True when there was something to erase.
   bool erase(std::string_view key);
   // Sets every entry of `other`, whose values win.

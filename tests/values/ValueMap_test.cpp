@@ -112,6 +112,25 @@ TEST(ValueMapTest, KeepsAKeysPlaceWhenItsValueIsReplaced) {
   EXPECT_EQ(map.text(), R"({"b":"new","c":3,"a":4})");
 }
 
+TEST(ValueMapTest, AddsKeysThatAreNew) {
+  ValueMap map;
+  for (int at = 0; at < 40; ++at) map.add("key" + std::to_string(at), at);
+  EXPECT_EQ(map.size(), 40U);
+  for (int at = 0; at < 40; ++at) EXPECT_EQ(map.integer("key" + std::to_string(at)), at);
+}
+
+TEST(ValueMapTest, AMergedTextReplacesAnEqualOneAndAnother) {
+  const Value text("some text");
+  ValueMap map{{"same", text}, {"other", "before"}, {"kept", 1}};
+  const std::size_t bytes = map.bytes();
+  map.merge({{"other", "longer than before"}, {"same", text}, {"new", true}});
+  EXPECT_EQ(map, (ValueMap{{"same", text}, {"other", "longer than before"}, {"kept", 1}, {"new", true}}));
+  EXPECT_GT(map.bytes(), bytes);
+  map.erase("new");
+  map.merge({{"other", "before"}});
+  EXPECT_EQ(map.bytes(), bytes);
+}
+
 TEST(ValueMapTest, OfAKeyGivenTwiceTheLastValueWins) {
   EXPECT_EQ((ValueMap{{"a", 1}, {"b", 2}, {"a", 3}}).text(), R"({"a":3,"b":2})");
 }

@@ -14,6 +14,9 @@ namespace {
 
 // Room made for what a header claims, at most: the rest is made as it comes.
 constexpr std::uint32_t kMostReserved = 64;
+// A map among the arguments is mostly a message, to which its session adds some entries of its own.
+constexpr std::size_t kMessageDepth = 3;
+constexpr std::uint32_t kRoomForAdditions = 3;
 // No method takes as many. More are refused, so that a frame of empty arguments does not become a vast list.
 constexpr std::size_t kMostArguments = 16;
 
@@ -156,8 +159,9 @@ bool RpcFrameVisitor::open(bool isMap, std::uint32_t count) {
   const std::uint32_t room = std::min(count, kMostReserved);
   container.map = {};
   container.values = {};
+  container.keyBits = 0;
   if (isMap) {
-    container.map.reserve(room);
+    container.map.reserve(depth_ == kMessageDepth ? room + kRoomForAdditions : room);
   } else {
     container.values.reserve(room);
   }
@@ -191,9 +195,20 @@ bool RpcFrameVisitor::put(Value value) {
   } else if (container.awaitsKey) {
     return refuse("has a key that is not a text");
   } else {
-    container.map.set(std::move(container.key), std::move(value));
+    putInMap(container, std::move(value));
   }
   return true;
+}
+
+// Mostly without a look at the keys that are there already: they are shared, and other threads count on them.
+void RpcFrameVisitor::putInMap(Container& container, Value value) {
+  const std::uint64_t bit = std::uint64_t{1} << (container.key.hash() & 63U);
+  if ((container.keyBits & bit) == 0) {
+    container.map.add(std::move(container.key), std::move(value));
+  } else {
+    container.map.set(std::move(container.key), std::move(value));
+  }
+  container.keyBits |= bit;
 }
 
 bool RpcFrameVisitor::putInFrame(Value value) {

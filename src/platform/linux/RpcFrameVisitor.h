@@ -59,6 +59,7 @@ class RpcFrameVisitor {
     bool awaitsKey = false;
     SharedString key;
     ValueMap map;
+    std::uint64_t keyBits = 0;  // one bit of each key's hash; a key without its bit here is new
     std::vector<Value> values;
   };
 
@@ -75,6 +76,7 @@ class RpcFrameVisitor {
   bool setKind(const Value& value);
   bool setIdentifier(const Value& value);
   bool setMethod(std::string_view text);
+  static void putInMap(Container& container, Value value);
   bool putKey(std::string_view text);
   // Notes the first value that the protocol does not carry and goes on with a stand-in for it.
   bool refuse(const char* what);
