@@ -6,6 +6,7 @@
 #include <utility>
 
 #include "platform/linux/ThreadProperties.h"
+#include "platform/linux/WorkBatch.h"
 
 namespace tonewerk {
 namespace {
@@ -56,9 +57,13 @@ void ThreadQueue::run() {
                                                                        : kUtilityNiceness);
   std::vector<Task> batch;
   while (waitForWork(batch)) {
+    WorkBatch together;
     for (Task& held : batch) {
-      const Task work = std::move(held);  // destroyed before the next piece runs
-      work();
+      {
+        const Task work = std::move(held);  // destroyed before the next piece runs
+        work();
+      }
+      together.pieceHasRun();
     }
     batch.clear();
     if (batch.capacity() > kMostKeptCapacity) std::vector<Task>().swap(batch);

@@ -12,9 +12,6 @@
 namespace tonewerk {
 namespace {
 
-// A reply buffer that has grown past this is not kept.
-constexpr std::size_t kMostKeptReplyBytes = std::size_t{64} * 1024;
-
 // Of a method that nobody knows, in the answer that says so.
 constexpr std::size_t kMostMethodNameBytes = 64;
 
@@ -52,7 +49,7 @@ UnixConnection::UnixConnection(const UnixConnectionContext& context, std::uint64
       socket_(std::move(socket)),
       reader_(context.texts),
       load_(std::make_shared<RequestLoad>(context.waker, identifier)),
-      outbox_(std::make_shared<ReplyOutbox>(context.waker, identifier)) {
+      outbox_(std::make_shared<ReplyOutbox>(socket_.get(), context.waker, identifier)) {
   ucred peer{};
   socklen_t size = sizeof(peer);
   if (::getsockopt(socket_.get(), SOL_SOCKET, SO_PEERCRED, &peer, &size) == 0) {
@@ -82,14 +79,14 @@ void UnixConnection::resume() {
 
 void UnixConnection::handleEvents(std::uint32_t events) {
   if (hasEnded_) return;
-  if ((events & EPOLLOUT) != 0) sendReplies();
+  if ((events & EPOLLOUT) != 0) replies_ = outbox_->goOn();
   if (!isPaused_) receive();
   handleWake();
 }
 
 void UnixConnection::handleWake() {
   if (hasEnded_) return;
-  sendReplies();
+  replies_ = outbox_->goOn();
   if (isPaused_ && hasRoom()) process(std::exchange(rest_, {}));
   updateInterest();
 }
@@ -101,7 +98,7 @@ void UnixConnection::receive() {
   if (count == 0) return end();
   if (errno == EINTR) return;
   if (errno == EAGAIN) {
-    if (peerStoppedReading_) end();
+    if (replies_ == ReplyOutbox::State::kRefused) end();
     return;
   }
   if (errno != ECONNRESET) {
@@ -131,10 +128,10 @@ void UnixConnection::process(std::string_view bytes) {
 void UnixConnection::dispatch(RpcFrame& frame) {
   if (frame.kind == RpcFrame::Kind::kResponse) return endAsBroken("a response");
   const std::optional<std::size_t> method = interface_->find(frame.method);
-  const Reply reply = frame.kind == RpcFrame::Kind::kRequest ? Reply(outbox_, frame.identifier) : Reply();
+  Reply reply = frame.kind == RpcFrame::Kind::kRequest ? Reply(outbox_, frame.identifier) : Reply();
   if (const auto problem = problemWithFrame(frame, method)) return reply(problem);
   RequestToken token = load_->start(bytesHeldBy(frame));
-  object_->handleRequest(*method, std::move(frame.arguments), reply, std::move(token));
+  object_->handleRequest(*method, std::move(frame.arguments), std::move(reply), std::move(token));
 }
 
 std::optional<ReplyError> UnixConnection::problemWithFrame(const RpcFrame& frame,
@@ -152,34 +149,14 @@ void UnixConnection::endAsBroken(std::string_view problem) {
   end();
 }
 
-void UnixConnection::sendReplies() {
-  if (peerStoppedReading_) return;
-  outbox_->takeInto(unsent_);
-  while (sent_ < unsent_.size()) {
-    const ssize_t count =
-        ::send(socket_.get(), unsent_.data() + sent_, unsent_.size() - sent_, MSG_DONTWAIT | MSG_NOSIGNAL);
-    if (count >= 0) {
-      sent_ += static_cast<std::size_t>(count);
-    } else if (errno == EAGAIN) {
-      return;
-    } else if (errno != EINTR) {
-      peerStoppedReading_ = true;
-      outbox_->close();
-      break;
-    }
-  }
-  sent_ = 0;
-  unsent_.clear();
-  if (unsent_.capacity() > kMostKeptReplyBytes) unsent_ = {};
-}
-
 void UnixConnection::updateInterest() {
   if (hasEnded_ || !isResumed_) return;
   std::uint32_t wanted = 0;
   if (!isPaused_) wanted |= EPOLLIN;
   // A peer that stopped reading may never send again, either. Being ready to write, which the socket then
   // always is, brings the round in which it is read empty.
-  if (!unsent_.empty() || (peerStoppedReading_ && !isPaused_)) wanted |= EPOLLOUT;
+  const bool isRefused = replies_ == ReplyOutbox::State::kRefused;
+  if (replies_ == ReplyOutbox::State::kFull || (isRefused && !isPaused_)) wanted |= EPOLLOUT;
   if (wanted == interest_) return;
   // Without anything wanted the socket is taken out: a hang-up is reported whether it is wanted or not.
   if (wanted == 0) {
@@ -194,7 +171,6 @@ void UnixConnection::updateInterest() {
 
 void UnixConnection::end() {
   if (hasEnded_) return;
-  sendReplies();  // what is ready, if the peer still takes it
   hasEnded_ = true;
   outbox_->close();
   if (interest_ != 0) context_.epoll.remove(socket_.get());

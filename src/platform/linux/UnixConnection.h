@@ -33,7 +33,7 @@ struct UnixConnectionContext {
 // One client's socket, on the I/O thread.
 //
 //   socket -> readBuffer -> RpcFrameReader -> exported object      as long as there is room for requests
-//   socket <- unsent_ <- ReplyOutbox <- replies of any thread
+//   socket <- ReplyOutbox <- replies of any thread
 //
 // A connection without room is paused: what was read and not used waits in rest_, and the socket is not
 // looked at.
@@ -65,9 +65,8 @@ class UnixConnection final : public MessagingConnection {
   void dispatch(RpcFrame& frame);
   std::optional<ReplyError> problemWithFrame(const RpcFrame& frame, std::optional<std::size_t> method) const;
   void endAsBroken(std::string_view problem);
-  void sendReplies();
   void updateInterest();
-  bool hasRoom() { return load_->hasRoom(unsent_.size() - sent_); }
+  bool hasRoom() { return load_->hasRoom(outbox_->unsentBytes()); }
 
   const UnixConnectionContext& context_;
   const std::uint64_t identifier_;
@@ -88,10 +87,9 @@ class UnixConnection final : public MessagingConnection {
   std::string rest_;
 
   std::shared_ptr<ReplyOutbox> outbox_;
-  std::string unsent_;
-  std::size_t sent_ = 0;             // of unsent_
-  bool peerStoppedReading_ = false;  // the connection ends once everything received has been read
-  std::uint32_t interest_ = 0;       // what the epoll has been told
+  // As last seen. Of a peer that refuses replies everything received is read, and then the connection ends.
+  ReplyOutbox::State replies_ = ReplyOutbox::State::kOpen;
+  std::uint32_t interest_ = 0;  // what the epoll has been told
 };
 
 }  // namespace tonewerk

@@ -12,6 +12,7 @@
 #include <utility>
 
 #include "platform/LogLine.h"
+#include "platform/linux/WorkBatch.h"
 
 namespace tonewerk {
 namespace {
@@ -58,6 +59,7 @@ void UnixSocketListener::run() {
   epoll_.add(waker_->fileDescriptor(), kWaker, EPOLLIN | EPOLLET);
   infoLog(log_, "listening at %@", socket_->name());
   while (!isStopping_) {
+    const WorkBatch round;
     for (const Epoll::Event& event : epoll_.wait(timeToNextAccept())) handle(event);
     if (acceptAgainAt_ && std::chrono::steady_clock::now() >= *acceptAgainAt_) resumeAccepting();
   }

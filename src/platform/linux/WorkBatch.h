@@ -1,0 +1,44 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstddef>
+#include <memory>
+#include <vector>
+
+namespace tonewerk {
+
+// Pieces of work that a thread runs one right after the other. What each of them would do for the same
+// object, such as sending its replies, can be put off to the end of the batch and is then done once.
+//
+// While one exists it is the calling thread's batch. One thread.
+class WorkBatch {
+ public:
+  // What is put off. Called on the thread that put it off.
+  class Ending {
+   public:
+    virtual ~Ending() = default;
+    virtual void endOfBatch() = 0;
+  };
+
+  // So long does nothing have to wait for others that follow it.
+  static constexpr std::size_t kMostPieces = 32;
+
+  WorkBatch();
+  WorkBatch(const WorkBatch&) = delete;
+  WorkBatch& operator=(const WorkBatch&) = delete;
+  ~WorkBatch();
+
+  // Puts `ending` off to the end of the calling thread's batch. False when it runs none.
+  static bool putOff(std::shared_ptr<Ending> ending);
+
+  // A piece of work has run. Ends the batch, and begins the next, after kMostPieces.
+  void pieceHasRun();
+
+ private:
+  void end();
+
+  std::vector<std::shared_ptr<Ending>> endings_;
+  std::size_t pieces_ = 0;
+};
+
+}  // namespace tonewerk
