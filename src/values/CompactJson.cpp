@@ -3,6 +3,8 @@
 
 #include <charconv>
 #include <cmath>
+#include <cstdint>
+#include <cstring>
 #include <string_view>
 
 namespace tonewerk {
@@ -56,17 +58,36 @@ void appendEscaped(std::string& out, unsigned char c) {
   out += kHex[c & 15];
 }
 
+bool isPlain(char c) { return static_cast<unsigned char>(c) >= 0x20 && c != '"' && c != '\\'; }
+
+// The same for eight characters at once; false, too, when one of them is not ASCII.
+bool arePlain(const char* eight) {
+  constexpr std::uint64_t kOnes = 0x0101010101010101U;
+  constexpr std::uint64_t kHighs = kOnes * 0x80;
+  std::uint64_t word = 0;
+  std::memcpy(&word, eight, sizeof(word));
+  // The high bit of each byte that is zero, or above one that is.
+  const auto zeroes = [](std::uint64_t bytes) { return (bytes - kOnes) & ~bytes; };
+  const std::uint64_t controls = word - kOnes * 0x20;
+  return ((word | controls | zeroes(word ^ kOnes * '"') | zeroes(word ^ kOnes * '\\')) & kHighs) == 0;
+}
+
+// Where, from `at` on, the next character is that must be escaped; the text's size for none.
+std::size_t endOfPlain(std::string_view text, std::size_t at) {
+  while (at + 8 <= text.size() && arePlain(text.data() + at)) at += 8;
+  while (at < text.size() && isPlain(text[at])) ++at;
+  return at;
+}
+
 void appendString(std::string& out, std::string_view text) {
   out += '"';
-  std::size_t plainFrom = 0;
-  for (std::size_t at = 0; at < text.size(); ++at) {
-    const auto c = static_cast<unsigned char>(text[at]);
-    if (c >= 0x20 && c != '"' && c != '\\') continue;
-    out.append(text, plainFrom, at - plainFrom);
-    appendEscaped(out, c);
-    plainFrom = at + 1;
+  for (std::size_t at = 0;;) {
+    const std::size_t end = endOfPlain(text, at);
+    out.append(text, at, end - at);
+    if (end == text.size()) break;
+    appendEscaped(out, static_cast<unsigned char>(text[end]));
+    at = end + 1;
   }
-  out.append(text, plainFrom);
   out += '"';
 }
 

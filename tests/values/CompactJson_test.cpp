@@ -69,6 +69,20 @@ TEST(CompactJsonTest, EscapesWhatJsonWants) {
   EXPECT_EQ(compact("\xC3\xA4"), "\"\xC3\xA4\"");
 }
 
+// Most of a text is looked at eight characters at a time.
+TEST(CompactJsonTest, EscapesWhereverInATextItStands) {
+  for (std::size_t at = 0; at < 24; ++at) {
+    for (const char* character : {"\"", "\\", "\x1f"}) {
+      const std::string plain(23, 'x');
+      const std::string before = plain.substr(0, at);
+      const std::string after = plain.substr(at);
+      const std::string escaped = *character == '\x1f' ? "\\u001f" : "\\" + std::string(character);
+      EXPECT_EQ(ValueMap({{"k", before + character + after}}).text(),
+                "{\"k\":\"" + before + escaped + after + "\"}");
+    }
+  }
+}
+
 TEST(CompactJsonTest, ADoubleReadsBackAsADouble) {
   EXPECT_EQ(compact(2.0), "2.0");
   EXPECT_EQ(compact(-0.0), "-0.0");

@@ -5,6 +5,8 @@
 #include <limits>
 #include <nlohmann/json.hpp>
 
+#include "values/CompactJson.h"
+
 namespace tonewerk {
 namespace {
 
@@ -44,48 +46,72 @@ class Path {
   int depth_ = 0;
 };
 
-std::optional<Json> jsonOf(const Value& value, Path& path, std::string& problem);
+// Writes straight into the text: a tree of the library's in between would cost several times as much, and a
+// session's file holds each of its messages.
+class PrettyWriter {
+ public:
+  explicit PrettyWriter(std::string& out) : out_(out) {}
 
-std::optional<Json> objectOf(const ValueMap& map, Path& path, std::string& problem) {
-  Json object = Json::object();
-  for (const ValueMap::Entry& entry : map) {
-    std::optional<Json> json =
-        path.within(entry.key.view(), [&] { return jsonOf(entry.value, path, problem); });
-    if (!json) return std::nullopt;
-    object[entry.key.string()] = std::move(*json);
+  // False when something cannot be said; problem() then names it.
+  bool write(const ValueMap& map) {
+    return writeList('{', '}', map, [this](const ValueMap::Entry& entry, std::size_t) {
+      appendCompactJson(out_, Value(entry.key));
+      out_ += ": ";
+      return write(entry.value) || isWithin(entry.key.string());
+    });
   }
-  return object;
-}
+  std::string problem() const { return place_ + " is " + unsaid_ + ", which JSON cannot say"; }
 
-std::optional<Json> jsonOf(const Value& value, Path& path, std::string& problem) {
-  switch (value.kind()) {
-    case Value::Kind::kBoolean:
-      return Json(*value.asBoolean());
-    case Value::Kind::kInteger:
-      return Json(*value.asInteger());
-    case Value::Kind::kUnsigned:
-      return Json(*value.asUnsigned());
-    case Value::Kind::kString:
-      return Json(value.asString()->string());
-    case Value::Kind::kDate:
-      return Json(value.text());
-    case Value::Kind::kMap:
-      return objectOf(*value.asMap(), path, problem);
-    case Value::Kind::kDouble:
-      if (std::isfinite(*value.asDouble())) return Json(*value.asDouble());
-      problem = path.text() + " is " + value.text() + ", which JSON cannot say";
-      return std::nullopt;
-    case Value::Kind::kArray:
-      break;
+ private:
+  bool write(const Value& value) {
+    if (const ValueMap* map = value.asMap()) return write(*map);
+    if (const ValueArray* array = value.asArray()) {
+      return writeList('[', ']', *array, [this](const Value& element, std::size_t index) {
+        return write(element) || isWithin("[" + std::to_string(index) + "]");
+      });
+    }
+    const double* number = value.asDouble();
+    if (number != nullptr && !std::isfinite(*number)) {
+      unsaid_ = value.text();
+      return false;
+    }
+    appendCompactJson(out_, value);
+    return true;
   }
-  Json array = Json::array();
-  for (const Value& element : *value.asArray()) {
-    std::optional<Json> json = path.within(array.size(), [&] { return jsonOf(element, path, problem); });
-    if (!json) return std::nullopt;
-    array.push_back(std::move(*json));
+
+  template <typename List, typename WriteElement>
+  bool writeList(char open, char close, const List& list, WriteElement writeElement) {
+    out_ += open;
+    indentation_ += 2;
+    std::size_t index = 0;
+    for (const auto& element : list) {
+      if (index > 0) out_ += ',';
+      startLine();
+      if (!writeElement(element, index++)) return false;
+    }
+    indentation_ -= 2;
+    if (!list.empty()) startLine();
+    out_ += close;
+    return true;
   }
-  return array;
-}
+
+  void startLine() {
+    out_ += '\n';
+    out_.append(indentation_, ' ');
+  }
+
+  // On the way back out of what cannot be said: its place is within `part`. Always false.
+  bool isWithin(const std::string& part) {
+    const bool needsDot = !place_.empty() && place_.front() != '[';
+    place_ = part + (needsDot ? "." : "") + place_;
+    return false;
+  }
+
+  std::string& out_;
+  std::size_t indentation_ = 0;
+  std::string place_;   // as "a.b[2]"
+  std::string unsaid_;  // "nan" or an infinity
+};
 
 std::optional<Value> valueOf(const Json& json, Path& path, std::string& problem);
 
@@ -153,11 +179,11 @@ std::string wordsOf(const Json::exception& error) {
 std::string NlohmannJsonService::compact(const ValueMap& map) const { return map.text(); }
 
 std::optional<std::string> NlohmannJsonService::pretty(const ValueMap& map, std::string& problem) const {
-  Path path;
-  const std::optional<Json> json = objectOf(map, path, problem);
-  if (!json) return std::nullopt;
-  // Bytes that are no UTF-8, which no client can send, would throw.
-  return json->dump(2, ' ', false, Json::error_handler_t::replace);
+  std::string text;
+  PrettyWriter writer(text);
+  if (writer.write(map)) return text;
+  problem = writer.problem();
+  return std::nullopt;
 }
 
 std::optional<Value> NlohmannJsonService::parse(std::string_view text, std::string& problem) const {

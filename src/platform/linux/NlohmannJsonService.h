@@ -5,7 +5,7 @@
 
 namespace tonewerk {
 
-// JSON by the values' own compact writer and, for the rest, a JSON library. Pretty text is indented by two
+// JSON written by the values' own compact writer, and read by a JSON library. Pretty text is indented by two
 // spaces and ends without a newline; a double keeps a fraction or an exponent (2.0). An integer beyond the
 // 64-bit ones reads as a double; of a key given twice the last wins; values nested deeper than 200 are
 // refused.
