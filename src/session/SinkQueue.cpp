@@ -22,7 +22,11 @@ void SinkQueue::submit(std::size_t bytes, Task work) {
   });
 }
 
+void SinkQueue::post(Task work) { queue_->async(std::move(work)); }
+
 void SinkQueue::drain() { queue_->drain(); }
+
+bool SinkQueue::isCurrent() const { return queue_->isCurrent(); }
 
 void SinkQueue::finished(std::size_t bytes) {
   const std::lock_guard lock(mutex_);

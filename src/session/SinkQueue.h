@@ -25,8 +25,14 @@ class SinkQueue {
   // empty queue only.
   void submit(std::size_t bytes, Task work);
 
+  // Any thread; never waits. For work that keeps next to nothing and is bounded by other means.
+  void post(Task work);
+
   // Returns when everything submitted before has run.
   void drain();
+
+  // True on the thread that is running this queue's work.
+  bool isCurrent() const;
 
  private:
   void finished(std::size_t bytes);
