@@ -1,0 +1,116 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "support/MemoryLinkReport.h"
+
+#include <utility>
+
+namespace tonewerk {
+
+struct MemoryLinkReport::State {
+  mutable std::mutex mutex;  // guards all below
+  std::vector<std::shared_ptr<Session>> sessions;
+  bool answersAtOnce = true;
+  LinkReportSession::Backends backends = std::vector<std::string>{"memory"};
+  bool givesTokens = true;
+  std::size_t tokenCount = 0;
+  std::optional<std::string> problem;
+};
+
+class MemoryLinkReport::MemorySession final : public LinkReportSession {
+ public:
+  MemorySession(std::shared_ptr<State> state, std::shared_ptr<Session> session)
+      : state_(std::move(state)), session_(std::move(session)) {}
+  MemorySession(const MemorySession&) = delete;
+  MemorySession& operator=(const MemorySession&) = delete;
+  ~MemorySession() override {
+    const std::lock_guard lock(state_->mutex);
+    session_->isOpen = false;
+  }
+
+  void startConfigurationWithCompletionHandler(CompletionHandler handler) override {
+    {
+      const std::lock_guard lock(state_->mutex);
+      session_->handler = handler;
+      if (!state_->answersAtOnce) return;
+    }
+    handler(state_->backends);
+  }
+
+  bool sendMessageWithCategory(std::uint16_t category, std::uint16_t type, const ValueMap& payload,
+                               std::string& problem) override {
+    const std::lock_guard lock(state_->mutex);
+    if (state_->problem) {
+      problem = *state_->problem;
+      return false;
+    }
+    session_->messages.push_back({category, type, payload});
+    return true;
+  }
+
+  void flushMessages() override {
+    const std::lock_guard lock(state_->mutex);
+    ++session_->flushCount;
+  }
+
+  std::string description() const override { return "MemorySession"; }
+
+ private:
+  const std::shared_ptr<State> state_;
+  const std::shared_ptr<Session> session_;
+};
+
+MemoryLinkReport::MemoryLinkReport() : state_(std::make_shared<State>()) {}
+MemoryLinkReport::~MemoryLinkReport() = default;
+
+std::optional<std::string> MemoryLinkReport::newHierarchyTokenFromParentToken(
+    const std::optional<std::string>& parentToken) {
+  const std::lock_guard lock(state_->mutex);
+  if (!state_->givesTokens) return std::nullopt;
+  return parentToken.value_or("root") + "/" + std::to_string(++state_->tokenCount);
+}
+
+std::unique_ptr<LinkReportSession> MemoryLinkReport::initWithSessionInfo(
+    const ValueMap& sessionInfo, const ValueMap& userInfo, const ValueArray* /*frameworksToCheck*/) {
+  auto session = std::make_shared<Session>();
+  session->sessionInfo = sessionInfo;
+  session->userInfo = userInfo;
+  const std::lock_guard lock(state_->mutex);
+  state_->sessions.push_back(session);
+  return std::make_unique<MemorySession>(state_, std::move(session));
+}
+
+void MemoryLinkReport::answerAtOnce(LinkReportSession::Backends backends) {
+  const std::lock_guard lock(state_->mutex);
+  state_->answersAtOnce = true;
+  state_->backends = std::move(backends);
+}
+
+void MemoryLinkReport::answerLater() {
+  const std::lock_guard lock(state_->mutex);
+  state_->answersAtOnce = false;
+}
+
+void MemoryLinkReport::answer(std::size_t at, LinkReportSession::Backends backends) {
+  session(at).handler(std::move(backends));
+}
+
+void MemoryLinkReport::giveNoTokens() {
+  const std::lock_guard lock(state_->mutex);
+  state_->givesTokens = false;
+}
+
+void MemoryLinkReport::failSending(std::string problem) {
+  const std::lock_guard lock(state_->mutex);
+  state_->problem = std::move(problem);
+}
+
+std::size_t MemoryLinkReport::count() const {
+  const std::lock_guard lock(state_->mutex);
+  return state_->sessions.size();
+}
+
+MemoryLinkReport::Session MemoryLinkReport::session(std::size_t at) const {
+  const std::lock_guard lock(state_->mutex);
+  return *state_->sessions.at(at);
+}
+
+}  // namespace tonewerk
