@@ -29,7 +29,9 @@ StoreDatabase::Result StoreDatabase::write(std::span<const StoreRow> rows) {
     const bool inserted = std::visit([this](const auto& held) { return insert(held); }, row);
     if (!inserted) return fail();
   }
-  return database_.run("COMMIT") ? Result::kDone : fail();
+  if (!database_.run("COMMIT")) return fail();
+  rtc_->committed();
+  return Result::kDone;
 }
 
 bool StoreDatabase::insert(const AnalyticsRow& row) { return analytics_->insert(row); }
@@ -37,6 +39,10 @@ bool StoreDatabase::insert(const AnalyticsRow& row) { return analytics_->insert(
 bool StoreDatabase::insert(const MetricRow& row) { return metrics_->insert(row); }
 
 bool StoreDatabase::insert(const PowerRow& row) { return power_->insert(row); }
+
+bool StoreDatabase::insert(const RtcSessionRow& row) { return rtc_->insert(row); }
+
+bool StoreDatabase::insert(const RtcMessageRow& row) { return rtc_->insert(row); }
 
 void StoreDatabase::setBounds(const StoreBounds& bounds) {
   bounds_ = bounds;
@@ -87,11 +93,13 @@ StoreDatabase::Result StoreDatabase::open() {
   analytics_.emplace(database_, json_);
   metrics_.emplace(database_);
   power_.emplace(database_, json_);
+  rtc_.emplace(database_, json_, fileNumber_);
   trimmer_.emplace(database_);
   return Result::kDone;
 }
 
 bool StoreDatabase::prepareFile() {
+  ++fileNumber_;
   // Before anything else is in the file: later these would take effect only with a rewrite of the whole.
   // Pages of 8 KiB are cheaper to fill than smaller ones, and a commit of a single message still writes only
   // one.
@@ -131,6 +139,7 @@ void StoreDatabase::close() {
   analytics_.reset();
   metrics_.reset();
   power_.reset();
+  rtc_.reset();
   trimmer_.reset();
   database_.close();
 }

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <cstdint>
 #include <optional>
 #include <span>
 #include <string>
@@ -8,6 +9,7 @@
 #include "platform/linux/AnalyticsTable.h"
 #include "platform/linux/MetricTable.h"
 #include "platform/linux/PowerTable.h"
+#include "platform/linux/RtcTable.h"
 #include "platform/linux/SqliteDatabase.h"
 #include "platform/linux/StoreRow.h"
 #include "platform/linux/StoreTrimmer.h"
@@ -52,6 +54,8 @@ class StoreDatabase {
   bool insert(const AnalyticsRow& row);
   bool insert(const MetricRow& row);
   bool insert(const PowerRow& row);
+  bool insert(const RtcSessionRow& row);
+  bool insert(const RtcMessageRow& row);
   void applyBounds();
   Result resultOf(StoreTrimmer::Outcome outcome, bool& moreToDo);
   Result fail();
@@ -65,7 +69,9 @@ class StoreDatabase {
   std::optional<AnalyticsTable> analytics_;  // while it is open
   std::optional<MetricTable> metrics_;       // likewise
   std::optional<PowerTable> power_;          // likewise
+  std::optional<RtcTable> rtc_;              // likewise
   std::optional<StoreTrimmer> trimmer_;      // likewise
+  std::uint64_t fileNumber_ = 1;             // of the files that this process began or found, the open one's
   StoreBounds bounds_;
   std::string problem_;
 };

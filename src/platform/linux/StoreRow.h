@@ -4,6 +4,7 @@
 #include <array>
 #include <cstddef>
 #include <cstdint>
+#include <memory>
 #include <string>
 #include <variant>
 
@@ -42,8 +43,41 @@ struct PowerRow {
   std::size_t bytes() const { return sizeof(PowerRow) + payload.bytes(); }
 };
 
+// A real-time-communication session. Its rows share it, so that each finds the session's identifier.
+struct RtcSessionRecord {
+  double startedAt = 0.0;  // seconds since 1970
+  ValueMap sessionInfo;
+  ValueMap userInfo;
+
+  // Where the store keeps it: the row's identifier, in which of the files that it wrote. The writer's alone.
+  struct Place {
+    std::int64_t identifier = 0;
+    std::uint64_t file = 0;
+  };
+  Place place;
+};
+
+struct RtcSessionRow {
+  std::shared_ptr<RtcSessionRecord> session;
+
+  std::size_t bytes() const {
+    return sizeof(RtcSessionRecord) + session->sessionInfo.bytes() + session->userInfo.bytes();
+  }
+};
+
+// One of its messages.
+struct RtcMessageRow {
+  double sentAt = 0.0;  // seconds since 1970
+  std::shared_ptr<RtcSessionRecord> session;
+  std::uint16_t category = 0;
+  std::uint16_t type = 0;
+  ValueMap payload;
+
+  std::size_t bytes() const { return sizeof(RtcMessageRow) + payload.bytes(); }
+};
+
 // What the store writes as one row of one of its tables.
-using StoreRow = std::variant<AnalyticsRow, MetricRow, PowerRow>;
+using StoreRow = std::variant<AnalyticsRow, MetricRow, PowerRow, RtcSessionRow, RtcMessageRow>;
 
 inline std::size_t bytesOf(const StoreRow& row) {
   return std::visit([](const auto& held) { return held.bytes(); }, row);
