@@ -8,12 +8,16 @@
 #include <chrono>
 #include <cstdint>
 #include <memory>
+#include <optional>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "platform/Clock.h"
+#include "platform/LinkReport.h"
 #include "platform/Log.h"
 #include "platform/Metricon.h"
+#include "platform/SerialQueue.h"
 #include "platform/TracePoints.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingSession.h"
@@ -65,6 +69,58 @@ class CountingMetricon final : public Metricon {
   std::uint64_t events = 0;
 };
 
+class QuietLinkReport final : public LinkReport {
+ public:
+  std::optional<std::string> newHierarchyTokenFromParentToken(const std::optional<std::string>&) override {
+    return "token";
+  }
+  std::unique_ptr<LinkReportSession> initWithSessionInfo(const ValueMap&, const ValueMap&,
+                                                         const ValueArray*) override {
+    return std::make_unique<Session>();
+  }
+
+ private:
+  class Session final : public LinkReportSession {
+   public:
+    void startConfigurationWithCompletionHandler(CompletionHandler handler) override {
+      handler(std::vector<std::string>{"quiet"});
+    }
+    bool sendMessageWithCategory(std::uint16_t, std::uint16_t, const ValueMap& payload,
+                                 std::string&) override {
+      benchmark::DoNotOptimize(payload.size());
+      return true;
+    }
+    void flushMessages() override {}
+    std::string description() const override { return "quiet"; }
+  };
+};
+
+// Runs work where it is queued, so that what sinks' threads do is measured, too.
+class ImmediateQueues final : public SerialQueueFactory {
+ public:
+  std::unique_ptr<SerialQueue> makeSerialQueue(std::string name, QueuePriority) override {
+    return std::make_unique<Queue>(std::move(name));
+  }
+
+ private:
+  class Queue final : public SerialQueue {
+   public:
+    explicit Queue(std::string name) : name_(std::move(name)) {}
+    void async(Task work) override {
+      const bool wasRunning = std::exchange(isRunning_, true);
+      work();
+      isRunning_ = wasRunning;
+    }
+    void drain() override {}
+    bool isCurrent() const override { return isRunning_; }
+    const std::string& name() const override { return name_; }
+
+   private:
+    const std::string name_;
+    bool isRunning_ = false;
+  };
+};
+
 class Core {
  public:
   Core() : context_(platform(), allWorkerClasses()) {}
@@ -85,7 +141,7 @@ class Core {
     return {log_,
             tracePoints_,
             clock_,
-            doubles_.queues,
+            queues_,
             doubles_.timers,
             doubles_.processes,
             doubles_.system,
@@ -94,6 +150,7 @@ class Core {
             doubles_.files,
             doubles_.json,
             metricon_,
+            linkReport_,
             "/logs"};
   }
 
@@ -101,7 +158,9 @@ class Core {
   QuietLog log_;
   SilentTracePoints tracePoints_;
   RunningClock clock_;
+  ImmediateQueues queues_;
   CountingMetricon metricon_;
+  QuietLinkReport linkReport_;
   TWReportingContext context_;
 };
 

@@ -11,6 +11,7 @@ class Diagwire;
 class Energybook;
 class FileSystem;
 class JsonService;
+class LinkReport;
 class Log;
 class Metricon;
 class PreferenceStore;
@@ -36,6 +37,7 @@ struct Platform {
   Metricon& metricon;
   Energybook& energybook;
   Diagwire& diagwire;
+  LinkReport& linkReport;
   // Where reports for people go; absolute.
   std::string logsDirectory = {};
 };

@@ -15,7 +15,9 @@
 #include "platform/LogCategory.h"
 #include "platform/LogLine.h"
 #include "platform/Platform.h"
+#include "platform/linux/CurlHttpClient.h"
 #include "platform/linux/Directories.h"
+#include "platform/linux/LinuxLinkReport.h"
 #include "platform/linux/LinuxPlatform.h"
 #include "platform/linux/ReportStore.h"
 #include "platform/linux/ServerSocket.h"
@@ -38,6 +40,8 @@ constexpr int kKilled = 2;
 
 // How long the end waits for a disk that does not answer.
 constexpr std::chrono::seconds kFlushTimeout{10};
+// How long it waits for endpoints in the network.
+constexpr std::chrono::seconds kNetworkTimeout{5};
 
 constexpr std::string_view kHelp =
     "Usage: twreportingd [--help | --version]\n"
@@ -58,6 +62,8 @@ class Daemon {
         metricon_(store_, linux.preferences(), linux.clock(), log),
         energybook_(store_, linux.clock()),
         diagwire_(store_, linux.clock()),
+        linkReport_(store_, linux.preferences(), linux.clock(), log, TONEWERK_VERSION,
+                    [] { return std::make_unique<CurlHttpClient>("twreportingd/" TONEWERK_VERSION); }),
         context_(platformOf(linux, directories), allWorkerClasses()),
         service_(TWReportingService::make([this] { endOnKillRequest(); })),
         listener_(std::move(socket), log) {
@@ -76,7 +82,7 @@ class Daemon {
 
  private:
   Platform platformOf(LinuxPlatform& linux, const Directories& directories) {
-    Platform platform = linux.platform(metricon_, energybook_, diagwire_);
+    Platform platform = linux.platform(metricon_, energybook_, diagwire_, linkReport_);
     platform.logsDirectory = directories.logs;
     return platform;
   }
@@ -89,13 +95,16 @@ class Daemon {
 
   void flushSinks() {
     context_.fileSinkQueue().drain();
-    store_.flush(kFlushTimeout);  // a failure is in the store's own log lines
+    context_.linkReportQueues().drain();
+    linkReport_.finish(kNetworkTimeout);  // what is lost is in the exporters' own log lines
+    store_.flush(kFlushTimeout);          // a failure is in the store's own log lines
   }
 
   ReportStore store_;
   StoreMetricon metricon_;
   StoreEnergybook energybook_;
   StoreDiagwire diagwire_;
+  LinuxLinkReport linkReport_;
   TWReportingContext context_;
   std::shared_ptr<TWReportingService> service_;
   UnixSocketListener listener_;

@@ -36,6 +36,7 @@ using AudioServiceType = std::uint16_t;
 inline constexpr AudioServiceType kServiceGeneric = 0;
 inline constexpr AudioServiceType kServiceStandalone = 5;
 inline constexpr AudioServiceType kServiceTest = 11;
+inline constexpr AudioServiceType kServiceApiUsage = 12;
 inline constexpr AudioServiceType kServiceUnknown = 65535;
 
 // A session's identifier, chosen by its client. 0 is no session, 1 the daemon's own single-message session.

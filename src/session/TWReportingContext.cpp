@@ -5,6 +5,7 @@
 #include <cassert>
 
 #include "platform/DeviceFacts.h"
+#include "platform/LogLine.h"
 #include "session/TWReportingUtility.h"
 
 namespace tonewerk {
@@ -41,6 +42,7 @@ TWReportingContext::TWReportingContext(const Platform& platform,
 
 TWReportingContext::~TWReportingContext() {
   reportingServerQueue_.reset();
+  endLinkReportQueues();
   fileSinkQueue_.reset();
   currentContext = nullptr;
 }
@@ -65,6 +67,25 @@ SinkQueue& TWReportingContext::fileSinkQueue() {
         platform_.queues.makeSerialQueue("com.orvane.tonewerk.reporting.files", QueuePriority::kUtility));
   });
   return *fileSinkQueue_;
+}
+
+PrivateQueues& TWReportingContext::linkReportQueues() {
+  std::call_once(linkReportQueuesOnce_, [this] {
+    linkReportQueues_ = std::make_unique<PrivateQueues>(
+        platform_.queues.makeSerialQueue("com.orvane.tonewerk.session.linkreport", QueuePriority::kUtility));
+  });
+  return *linkReportQueues_;
+}
+
+// What waits for backends now waits in vain.
+void TWReportingContext::endLinkReportQueues() {
+  if (linkReportQueues_ == nullptr) return;
+  linkReportQueues_->drain();
+  const std::uint64_t lost = linkReportQueues_->droppedCount() + linkReportQueues_->heldCount();
+  linkReportQueues_.reset();
+  if (lost == 0) return;
+  errorLog(logCategories.linkReport, "real-time-communication work dropped that waited for backends: %lu",
+           lost);
 }
 
 bool TWReportingContext::isInternalBuild() {

@@ -12,6 +12,7 @@
 #include "platform/Platform.h"
 #include "platform/SerialQueue.h"
 #include "session/AudioEvent.h"
+#include "session/PrivateQueues.h"
 #include "session/SinkQueue.h"
 #include "session/TWReportingNameTable.h"
 #include "session/TWReportingSessionWorkerRegistry.h"
@@ -43,6 +44,9 @@ class TWReportingContext {
 
   // Where sinks that write files do so, so that the work queue does not wait for a disk. Made on first use.
   SinkQueue& fileSinkQueue();
+
+  // Where sessions' workers use the real-time-communication reporting service. Made on first use.
+  PrivateQueues& linkReportQueues();
 
   // Asked of the device once.
   bool isInternalBuild();
@@ -90,9 +94,13 @@ class TWReportingContext {
   std::once_flag workerRegistryOnce_;
   std::optional<TWReportingSessionWorkerRegistry> workerRegistry_;
 
-  // Last, so that they end first: their work may use anything above. The work queue feeds the file sink.
+  void endLinkReportQueues();
+
+  // Last, so that they end first: their work may use anything above. The work queue feeds the sinks'.
   std::once_flag fileSinkQueueOnce_;
   std::unique_ptr<SinkQueue> fileSinkQueue_;
+  std::once_flag linkReportQueuesOnce_;
+  std::unique_ptr<PrivateQueues> linkReportQueues_;
   std::once_flag reportingServerQueueOnce_;
   std::unique_ptr<SerialQueue> reportingServerQueue_;
 };

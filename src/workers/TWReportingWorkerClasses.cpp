@@ -7,6 +7,7 @@
 #include "workers/sinks/TWReportingSessionDiagwireWorker.h"
 #include "workers/sinks/TWReportingSessionEnergybookWorker.h"
 #include "workers/sinks/TWReportingSessionMetriconWorker.h"
+#include "workers/sinks/TWReportingSessionRtcWorker.h"
 #include "workers/sinks/TWReportingSessionSummaryJsonFileWorker.h"
 #include "workers/sinks/TWReportingSessionSummaryWorker.h"
 
@@ -24,6 +25,7 @@ std::vector<const TWReportingSessionWorkerClass*> allWorkerClasses() {
       &TWReportingSessionEnergybookWorker::kWorkerClass,
       &TWReportingSessionDiagwireWorker::kWorkerClass,
       &TWReportingSessionSummaryJsonFileWorker::kWorkerClass,
+      &TWReportingSessionRtcWorker::kWorkerClass,
   };
 }
 

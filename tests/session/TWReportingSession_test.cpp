@@ -488,7 +488,8 @@ TEST_F(WorkerTest, TheDaemonsClassesComeInTheRegistrysOrder) {
               ElementsAre("TWReportingSessionVolumeMessagesWorker", "TWReportingSessionGatherMessagesWorker",
                           "TWReportingSessionSummaryWorker", "TWReportingSessionInputMessagesWorker",
                           "TWReportingSessionMetriconWorker", "TWReportingSessionEnergybookWorker",
-                          "TWReportingSessionDiagwireWorker", "TWReportingSessionSummaryJsonFileWorker"));
+                          "TWReportingSessionDiagwireWorker", "TWReportingSessionSummaryJsonFileWorker",
+                          "TWReportingSessionRtcWorker"));
 }
 
 TEST_F(WorkerTest, TheRegistryIsFilledOnce) {

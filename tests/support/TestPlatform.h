@@ -10,6 +10,7 @@
 #include "support/MemoryEnergybook.h"
 #include "support/MemoryFileSystem.h"
 #include "support/MemoryJsonService.h"
+#include "support/MemoryLinkReport.h"
 #include "support/MemoryLog.h"
 #include "support/MemoryMetricon.h"
 #include "support/MemoryPreferenceStore.h"
@@ -33,8 +34,8 @@ struct TestPlatform {
   TestPlatform& operator=(const TestPlatform&) = delete;
 
   Platform platform() {
-    return {log,         tracePoints, clock, queues,   timers,     processes, system, deviceFacts,
-            preferences, files,       json,  metricon, energybook, diagwire,  "/logs"};
+    return {log,         tracePoints, clock, queues,   timers,     processes, system,     deviceFacts,
+            preferences, files,       json,  metricon, energybook, diagwire,  linkReport, "/logs"};
   }
 
   MemoryLog log;
@@ -51,6 +52,7 @@ struct TestPlatform {
   MemoryMetricon metricon;
   MemoryEnergybook energybook;
   MemoryDiagwire diagwire;
+  MemoryLinkReport linkReport;
 };
 
 }  // namespace tonewerk

@@ -63,11 +63,12 @@ TimerService& LinuxPlatform::timers() { return adapters_->timers; }
 PreferenceStore& LinuxPlatform::preferences() { return adapters_->preferences; }
 JsonService& LinuxPlatform::json() { return adapters_->json; }
 
-Platform LinuxPlatform::platform(Metricon& metricon, Energybook& energybook, Diagwire& diagwire) {
+Platform LinuxPlatform::platform(Metricon& metricon, Energybook& energybook, Diagwire& diagwire,
+                                 LinkReport& linkReport) {
   Adapters& a = *adapters_;
-  return {*a.log,      a.tracePoints, a.clock,       a.queues,      a.timers,
-          a.processes, a.system,      a.deviceFacts, a.preferences, a.files,
-          a.json,      metricon,      energybook,    diagwire,      a.logsDirectory};
+  return {*a.log,     a.tracePoints, a.clock,       a.queues,       a.timers, a.processes,
+          a.system,   a.deviceFacts, a.preferences, a.files,        a.json,   metricon,
+          energybook, diagwire,      linkReport,    a.logsDirectory};
 }
 
 }  // namespace tonewerk

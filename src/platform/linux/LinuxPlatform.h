@@ -12,8 +12,7 @@ struct Directories;
 // One of each adapter, and the Platform made of them. Whoever makes it lets it outlive what uses the
 // Platform.
 //
-// What records into the report store is the caller's: its adapters need the clock, the log and the
-// preferences from here.
+// The sinks are the caller's: their adapters need the clock, the log and the preferences from here.
 class LinuxPlatform {
  public:
   explicit LinuxPlatform(const Directories& directories);
@@ -29,7 +28,7 @@ class LinuxPlatform {
   JsonService& json();
 
   // The reporting services outlive what uses the result.
-  Platform platform(Metricon& metricon, Energybook& energybook, Diagwire& diagwire);
+  Platform platform(Metricon& metricon, Energybook& energybook, Diagwire& diagwire, LinkReport& linkReport);
 
  private:
   struct Adapters;

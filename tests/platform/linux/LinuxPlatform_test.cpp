@@ -10,6 +10,7 @@
 #include "platform/linux/Directories.h"
 #include "support/MemoryDiagwire.h"
 #include "support/MemoryEnergybook.h"
+#include "support/MemoryLinkReport.h"
 #include "support/MemoryMetricon.h"
 #include "support/TemporaryDirectory.h"
 
@@ -27,7 +28,8 @@ TEST(LinuxPlatformTest, LooksForEverythingWhereTheDirectoriesSay) {
   MemoryMetricon metricon;
   MemoryEnergybook energybook;
   MemoryDiagwire diagwire;
-  const Platform platform = linuxPlatform.platform(metricon, energybook, diagwire);
+  MemoryLinkReport linkReport;
+  const Platform platform = linuxPlatform.platform(metricon, energybook, diagwire, linkReport);
   EXPECT_EQ(platform.deviceFacts.boolean("InternalBuild"), true);
   EXPECT_EQ(platform.preferences.read("com.orvane.test", "a"), Value(1));
   EXPECT_FALSE(platform.preferences.write("com.orvane.test", "b", 2));
@@ -36,6 +38,7 @@ TEST(LinuxPlatformTest, LooksForEverythingWhereTheDirectoriesSay) {
   EXPECT_EQ(&platform.metricon, &metricon);
   EXPECT_EQ(&platform.energybook, &energybook);
   EXPECT_EQ(&platform.diagwire, &diagwire);
+  EXPECT_EQ(&platform.linkReport, &linkReport);
 }
 
 }  // namespace

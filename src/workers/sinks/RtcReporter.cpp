@@ -1,0 +1,188 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "workers/sinks/RtcReporter.h"
+
+#include <string_view>
+#include <utility>
+
+#include "platform/LogLine.h"
+#include "platform/TimerService.h"
+#include "session/PrivateQueues.h"
+#include "session/TWReportingContext.h"
+#include "session/TWReportingKeys.h"
+#include "session/TWReportingUtility.h"
+#include "workers/sinks/RtcSummary.h"
+#include "workers/sinks/TWReportingSessionRtcWorker.h"
+
+namespace tonewerk {
+namespace {
+
+constexpr std::string_view TWReportingClientNameTonewerk = "com.orvane.tonewerk";
+constexpr std::string_view TWReportingVersionNumber = "2.1";
+constexpr std::int64_t kClientType = 19;
+constexpr std::string_view kSessionIdentifierKey = "TWReportingSessionID";
+
+}  // namespace
+
+RtcReporter::RtcReporter(std::shared_ptr<PrivateQueue> queue) : queue_(std::move(queue)) {}
+
+RtcReporter::~RtcReporter() = default;
+
+void RtcReporter::start(const Start& start) {
+  debugLog(TWReportingSessionLinkReportCategory(), "entering linkreport %s", "start");
+  LinkReport& service = TWReportingContext::current().platform().linkReport;
+  linkReportAgentToken_ = service.newHierarchyTokenFromParentToken(std::nullopt);
+  if (!linkReportAgentToken_) {
+    errorLog(TWReportingSessionLinkReportCategory(),
+             "newHierarchyTokenFromParentToken returned nil. Will skip rtc for this session. %s", "start");
+    return;
+  }
+  linkReportSession_ =
+      service.initWithSessionInfo(sessionInfoOf(start, *linkReportAgentToken_), userInfoOf(start), nullptr);
+  waitForBackends();
+}
+
+ValueMap RtcReporter::sessionInfoOf(const Start& start, const std::string& token) {
+  const bool batch =
+      TWReportingSessionRtcWorker::shouldBatchLinkReportEventsForServiceType(start.serviceType);
+  ValueMap info{{kLinkReportSessionInfoClientType, kClientType},
+                {kLinkReportSessionInfoClientVersion, Value(TWReportingVersionNumber).number()},
+                {kLinkReportSessionInfoSessionID, start.reporterID},
+                {kLinkReportSessionInfoBatchEvent, batch},
+                {kLinkReportSessionInfoHierarchyToken, token},
+                {kLinkReportSessionInfoContainsRealtimeEvents, !batch}};
+  if (const Value* application = start.configuration.find(TWReportingApplicationName)) {
+    info.set(kLinkReportSessionInfoClientBundleID, *application);
+  }
+  return info;
+}
+
+ValueMap RtcReporter::userInfoOf(const Start& start) {
+  const std::string serviceName =
+      start.isSingleMessageSession ? TWReportingUtilityGenerateServiceNameFromServiceType(start.serviceType)
+                                   : start.serviceName;
+  ValueMap info{{kLinkReportUserInfoClientName, TWReportingClientNameTonewerk},
+                {kSessionIdentifierKey, start.reporterID},
+                {kLinkReportUserInfoServiceName, serviceName}};
+  info.merge(start.configuration);
+  return info;
+}
+
+// The wait occupies the queue, not the thread: other sessions' queues run on it.
+void RtcReporter::waitForBackends() {
+  const std::uint64_t run = ++run_;
+  hasAnswer_ = false;
+  linkReportSessionStarted_ = false;
+  linkReportSession_->startConfigurationWithCompletionHandler(
+      [weak = weak_from_this(), run](const LinkReportSession::Backends& backends) {
+        const auto self = weak.lock();
+        if (self == nullptr) return;
+        self->queue_->interrupt([weak, run, backends] {
+          if (const auto alive = weak.lock()) alive->takeBackends(run, backends);
+        });
+      });
+  debugLog(TWReportingSessionLinkReportCategory(), "waiting to find backends");
+  if (hasAnswer_) {
+    endWait();
+    return;
+  }
+  queue_->hold();
+  timeout_ =
+      TWReportingContext::current().platform().timers.repeat(kBackendTimeout, [weak = weak_from_this(), run] {
+        const auto self = weak.lock();
+        if (self == nullptr) return;
+        self->queue_->interrupt([weak, run] {
+          if (const auto alive = weak.lock()) alive->takeTimeout(run);
+        });
+      });
+}
+
+// An answer that comes after the time-out still opens the way for what follows.
+void RtcReporter::takeBackends(std::uint64_t run, const LinkReportSession::Backends& backends) {
+  if (run != run_ || linkReportSession_ == nullptr) return;
+  hasAnswer_ = true;
+  linkReportSessionStarted_ = backends.has_value();
+  if (backends) {
+    defaultLog(TWReportingSessionLinkReportCategory(), "list of backends %@", *backends);
+  } else {
+    errorLog(TWReportingSessionLinkReportCategory(),
+             "no backends found, this session won't get sent to the server");
+  }
+  if (queue_->isHeld()) endWait();
+}
+
+void RtcReporter::takeTimeout(std::uint64_t run) {
+  if (run != run_ || !queue_->isHeld()) return;
+  errorLog(TWReportingSessionLinkReportCategory(), "timed out waiting for backends");
+  goOn();
+}
+
+void RtcReporter::endWait() {
+  if (linkReportSessionStarted_) {
+    debugLog(TWReportingSessionLinkReportCategory(), "continuing with backends!");
+  } else {
+    errorLog(TWReportingSessionLinkReportCategory(), "failed to find backend");
+  }
+  goOn();
+}
+
+void RtcReporter::goOn() {
+  timeout_.reset();
+  if (const std::uint64_t dropped = queue_->takeDroppedCount(); dropped > 0) {
+    errorLog(TWReportingSessionLinkReportCategory(),
+             "dropped while waiting for backends, for want of room: %lu", dropped);
+  }
+  queue_->release();
+}
+
+void RtcReporter::handleMessage(TWReportingSessionMessage& message) {
+  if (!linkReportSessionStarted_) {
+    defaultLog(TWReportingSessionLinkReportCategory(), "Session never started. %s", "handleMessage");
+    return;
+  }
+  sendMessage(message);
+}
+
+void RtcReporter::sendMessage(TWReportingSessionMessage& message) {
+  debugLog(TWReportingSessionLinkReportCategory(), "entering linkreport %s", "_sendMessage");
+  const std::uint16_t category =
+      TWReportingSessionRtcWorker::retrieveLinkReportCategoryFromCategory(message.category);
+  if (!TWReportingUtilityIsInternalBuild()) message.message.erase(TWReportingInternalEventEpochTime);
+  std::string problem;
+  if (linkReportSession_->sendMessageWithCategory(category, message.type, message.message, problem)) {
+    debugLog(TWReportingSessionLinkReportCategory(),
+             "LinkReportAgent %@ : message %@ : category %i : type %i", *linkReportSession_, message.message,
+             category, message.type);
+  } else if (!problem.empty()) {
+    errorLog(TWReportingSessionLinkReportCategory(), "error sending message %@", problem);
+  }
+}
+
+void RtcReporter::sendSummary(const TWReportingSessionMessages& messages, AudioServiceType serviceType,
+                              ReporterID reporterID) {
+  if (!linkReportSessionStarted_ || messages.empty()) return;
+  TWReportingSessionMessage summary(
+      rtcSummaryOf(messages, serviceType, TWReportingSessionRtcWorker::kWorkerClass), kCategoryUnknown,
+      kTypeUnknown);
+  defaultLog(TWReportingSessionLinkReportCategory(), "sending rtc summary event. reporterID=%lli",
+             reporterID);
+  for (const ValueMap::Entry& entry : summary.message) {
+    debugLog(TWReportingSessionLinkReportCategory(), "sending rtc summary event. reporterID=%lli %@=\"%@\"",
+             reporterID, entry.key, entry.value);
+  }
+  sendMessage(summary);
+}
+
+void RtcReporter::stop() {
+  if (!linkReportSessionStarted_) {
+    defaultLog(TWReportingSessionLinkReportCategory(), "Session never started. %s", "stop");
+    return;
+  }
+  debugLog(TWReportingSessionLinkReportCategory(), "entering linkreport %s", "stop");
+  linkReportSession_->flushMessages();
+  linkReportSession_.reset();
+  linkReportAgentToken_.reset();
+  linkReportSessionStarted_ = false;
+  debugLog(TWReportingSessionLinkReportCategory(), "stopping and setting session to nil");
+}
+
+}  // namespace tonewerk

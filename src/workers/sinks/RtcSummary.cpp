@@ -1,0 +1,67 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "workers/sinks/RtcSummary.h"
+
+#include <algorithm>
+#include <string>
+#include <unordered_map>
+#include <vector>
+
+namespace tonewerk {
+namespace {
+
+// Joined texts under keys, in the order of the keys' first coming.
+class JoinedTexts {
+ public:
+  void add(const SharedString& key, const Value& value) {
+    const auto [place, isNew] = places_.try_emplace(key, texts_.size());
+    if (isNew) {
+      texts_.push_back({key, value.text()});
+      return;
+    }
+    std::string& text = texts_[place->second].text;
+    text += ',';
+    if (const SharedString* same = value.asString()) {
+      text += same->view();
+    } else {
+      text += value.text();
+    }
+  }
+
+  ValueMap map() const {
+    ValueMap map;
+    map.reserve(texts_.size());
+    for (const Text& joined : texts_) map.set(joined.key, joined.text);
+    return map;
+  }
+
+ private:
+  struct Text {
+    SharedString key;
+    std::string text;
+  };
+  struct KeyHash {
+    std::size_t operator()(const SharedString& key) const { return key.hash(); }
+  };
+  std::vector<Text> texts_;
+  std::unordered_map<SharedString, std::size_t, KeyHash> places_;
+};
+
+bool isMeantFor(const TWReportingSessionWorkerClass& workerClass, const TWReportingSessionMessage& message) {
+  const auto& classes = message.destinationWorkers;
+  return classes.empty() || std::find(classes.begin(), classes.end(), &workerClass) != classes.end();
+}
+
+}  // namespace
+
+ValueMap rtcSummaryOf(const TWReportingSessionMessages& messages, AudioServiceType serviceType,
+                      const TWReportingSessionWorkerClass& workerClass) {
+  JoinedTexts summary;
+  summary.add("TW_Session_Summary_Event", serviceType);
+  for (const auto& message : messages) {
+    if (message->isRedundant || !message->isSessionStarted || !isMeantFor(workerClass, *message)) continue;
+    for (const ValueMap::Entry& entry : message->message) summary.add(entry.key, entry.value);
+  }
+  return summary.map();
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,81 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "workers/sinks/TWReportingSessionRtcWorker.h"
+
+#include <utility>
+
+#include "session/PrivateQueues.h"
+#include "session/TWReportingContext.h"
+#include "session/TWReportingSession.h"
+#include "workers/sinks/RtcReporter.h"
+
+namespace tonewerk {
+
+const TWReportingSessionWorkerClass TWReportingSessionRtcWorker::kWorkerClass =
+    workerClassOf<TWReportingSessionRtcWorker>("TWReportingSessionRtcWorker");
+
+std::shared_ptr<TWReportingSessionRtcWorker> TWReportingSessionRtcWorker::initWithSession(
+    const std::shared_ptr<TWReportingSession>& session) {
+  if (session->serviceType() == kServiceTest) return nullptr;
+  auto worker = std::make_shared<TWReportingSessionRtcWorker>();
+  worker->session = session;
+  return worker;
+}
+
+bool TWReportingSessionRtcWorker::shouldBatchLinkReportEventsForServiceType(AudioServiceType serviceType) {
+  return serviceType != kServiceApiUsage;
+}
+
+std::uint16_t TWReportingSessionRtcWorker::retrieveLinkReportCategoryFromCategory(
+    AudioEventCategory category) {
+  return static_cast<std::uint16_t>(category & 0xFFFF);
+}
+
+void TWReportingSessionRtcWorker::makeQueueOnFirstUse() {
+  if (linkReportQueue_ != nullptr) return;
+  linkReportQueue_ = TWReportingContext::current().linkReportQueues().makeQueue();
+  reporter_ = std::make_shared<RtcReporter>(linkReportQueue_);
+}
+
+std::optional<bool> TWReportingSessionRtcWorker::start() {
+  const auto owner = session.lock();
+  if (owner == nullptr || owner->serviceType() == kServiceTest) return false;
+  RtcReporter::Start start;
+  start.configuration = owner->configuration();
+  start.serviceName = owner->serviceName() + "_session";
+  start.serviceType = owner->serviceType();
+  start.reporterID = owner->reporterID();
+  start.isSingleMessageSession = owner->isSingleMessageSession();
+  makeQueueOnFirstUse();
+  const std::size_t bytes = sizeof(start) + start.configuration.bytes();
+  linkReportQueue_->submit(bytes, [reporter = reporter_, held = std::move(start)] { reporter->start(held); });
+  return true;
+}
+
+bool TWReportingSessionRtcWorker::handleMessage(const TWReportingSessionMessage& message) {
+  auto record = std::make_unique<TWReportingSessionMessage>(message.message, message.category, message.type);
+  makeQueueOnFirstUse();
+  const std::size_t bytes = sizeof(TWReportingSessionMessage) + record->message.bytes();
+  linkReportQueue_->submit(
+      bytes, [reporter = reporter_, held = std::move(record)] { reporter->handleMessage(*held); });
+  return false;
+}
+
+void TWReportingSessionRtcWorker::stop() {
+  const auto owner = session.lock();
+  if (owner == nullptr) return;
+  makeQueueOnFirstUse();
+  TWReportingSessionMessages copies;
+  copies.reserve(owner->messages().size());
+  std::size_t bytes = 0;
+  for (const auto& message : owner->messages()) {
+    copies.push_back(message->copyWithZone());
+    bytes += sizeof(TWReportingSessionMessage) + message->message.bytes();
+  }
+  // Two pieces, so that a summary which finds no room does not take the session's end with it.
+  linkReportQueue_->submit(
+      bytes, [reporter = reporter_, held = std::move(copies), serviceType = owner->serviceType(),
+              reporterID = owner->reporterID()] { reporter->sendSummary(held, serviceType, reporterID); });
+  linkReportQueue_->submit(0, [reporter = reporter_] { reporter->stop(); });
+}
+
+}  // namespace tonewerk
