@@ -1,0 +1,96 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <condition_variable>
+#include <cstddef>
+#include <deque>
+#include <map>
+#include <mutex>
+#include <nlohmann/json.hpp>
+#include <string>
+#include <thread>
+#include <vector>
+
+namespace tonewerk {
+
+// An OTLP/HTTP endpoint on the loopback interface that forgives nothing and misbehaves when told to.
+//
+//   OtlpReceiver receiver;
+//   receiver.answerNext({.status = 503, .headers = {"Retry-After: 1"}});
+//   ...
+//   ASSERT_TRUE(receiver.waitForRequests(2));
+//   EXPECT_THAT(receiver.problems(), IsEmpty());
+//
+// Takes one connection at a time and a request a connection. Any thread.
+class OtlpReceiver {
+ public:
+  enum class Fault {
+    kNone,
+    kHang,        // reads the request, then nothing until the peer goes
+    kGarbage,     // bytes that are no HTTP
+    kHugeBody,    // a body of 100 MB
+    kHugeHeader,  // a header of 100 MB
+    kCutBody,     // announces more than it sends
+    kCloseEarly,  // closes without an answer
+  };
+  struct Answer {
+    int status = 200;
+    std::vector<std::string> headers = {};
+    std::string body = "{}";
+    Fault fault = Fault::kNone;
+  };
+  struct Request {
+    std::string line;
+    std::map<std::string, std::string> headers;  // names in lower case
+    std::string body;                            // unpacked
+
+    nlohmann::json json() const { return nlohmann::json::parse(body, nullptr, false); }
+  };
+
+  OtlpReceiver();
+  OtlpReceiver(const OtlpReceiver&) = delete;
+  OtlpReceiver& operator=(const OtlpReceiver&) = delete;
+  ~OtlpReceiver();
+
+  // "http://127.0.0.1:PORT".
+  std::string address() const;
+  // An address at which nobody listens.
+  static std::string deadAddress();
+
+  // Answers the next requests in order, before the usual 200.
+  void answerNext(Answer answer);
+
+  // Until there were so many requests, for seconds at most; false when there were fewer.
+  bool waitForRequests(std::size_t count);
+  std::vector<Request> requests() const;
+  // Of all requests: the log records that were accepted or not.
+  std::vector<nlohmann::json> records() const;
+  // What is wrong with the requests, by the rules of the transport and of the schema.
+  std::vector<std::string> problems() const;
+
+ private:
+  void run();
+  void serve(int connection);
+  bool readRequest(int connection, Request& request);
+  void check(Request& request);
+  void send(int connection, const Answer& answer);
+  void sendForever(int connection, const std::string& beginning);
+  void waitForPeer(int connection);
+  bool waitReadable(int descriptor);
+
+  int listener_ = -1;
+  int port_ = 0;
+  int wakeRead_ = -1;
+  int wakeWrite_ = -1;
+
+  mutable std::mutex mutex_;
+  std::condition_variable arrived_;
+  // Guarded by mutex_.
+  std::deque<Answer> answers_;
+  std::vector<Request> requests_;
+  std::vector<std::string> problems_;
+
+  std::thread thread_;  // last: it uses all above
+};
+
+}  // namespace tonewerk

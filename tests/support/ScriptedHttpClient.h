@@ -1,0 +1,31 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <deque>
+#include <utility>
+#include <vector>
+
+#include "platform/linux/HttpClient.h"
+
+namespace tonewerk {
+
+// Answers requests from a list, then with 200, and keeps them. One thread.
+class ScriptedHttpClient final : public HttpClient {
+ public:
+  HttpAnswer post(const HttpRequest& request) override {
+    requests.push_back(request);
+    HttpAnswer answer;
+    answer.status = 200;
+    if (!answers.empty()) {
+      answer = std::move(answers.front());
+      answers.pop_front();
+    }
+    return answer;
+  }
+  void cancel() override {}
+
+  std::vector<HttpRequest> requests;
+  std::deque<HttpAnswer> answers;
+};
+
+}  // namespace tonewerk
