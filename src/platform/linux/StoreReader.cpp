@@ -33,12 +33,17 @@ std::string eventQuery(const EventFilter& filter) {
   return "SELECT * FROM (" + sql + " ORDER BY r.id DESC, n.position DESC LIMIT ?6) ORDER BY id";
 }
 
+// The rows of `sql`, which has an id, oldest first, or the newest so many.
+std::string limitedById(const std::string& sql, const EventFilter& filter) {
+  if (!filter.limit) return sql + " ORDER BY id";
+  return "SELECT * FROM (" + sql + " ORDER BY id DESC LIMIT ?6) ORDER BY id";
+}
+
 std::string powerQuery(const EventFilter& filter) {
   const std::string sql =
       "SELECT id, recorded_at, event_group, name, payload FROM power_event WHERE id > ?2" +
       conditions(filter, "name", "recorded_at");
-  if (!filter.limit) return sql + " ORDER BY id";
-  return "SELECT * FROM (" + sql + " ORDER BY id DESC LIMIT ?6) ORDER BY id";
+  return limitedById(sql, filter);
 }
 
 std::string metricQuery(const EventFilter& filter) {
@@ -46,8 +51,23 @@ std::string metricQuery(const EventFilter& filter) {
   unnamed.name.reset();
   const std::string sql = "SELECT id, posted_at, identifier, record FROM metric WHERE id > ?2" +
                           conditions(unnamed, "", "posted_at");
-  if (!filter.limit) return sql + " ORDER BY id";
-  return "SELECT * FROM (" + sql + " ORDER BY id DESC LIMIT ?6) ORDER BY id";
+  return limitedById(sql, filter);
+}
+
+constexpr const char* kRtcServiceName = "s.user_info ->> 'kLinkReportUserInfoServiceName'";
+
+std::string rtcSessionQuery(const EventFilter& filter) {
+  const std::string sql =
+      "SELECT s.id AS id, s.started_at, s.session_info, s.user_info FROM rtc_session AS s WHERE s.id > ?2";
+  return limitedById(sql + conditions(filter, kRtcServiceName, "s.started_at"), filter);
+}
+
+// A message can outlive its session's row; it then has no name.
+std::string rtcMessageQuery(const EventFilter& filter) {
+  const std::string sql =
+      "SELECT m.id AS id, m.sent_at, m.rtc_session, m.category, m.type, m.payload"
+      " FROM rtc_message AS m LEFT JOIN rtc_session AS s ON s.id = m.rtc_session WHERE m.id > ?2";
+  return limitedById(sql + conditions(filter, kRtcServiceName, "m.sent_at"), filter);
 }
 
 std::string engineOnQuery(const EventFilter& filter) {
@@ -101,6 +121,20 @@ bool StoreReader::readMetrics(const EventFilter& filter,
                               const std::function<void(const StoredMetric& metric)>& take) {
   return readRows(metricQuery(filter), filter, [&](const SqliteStatement& row) {
     take({row.integer(0), row.number(1), row.integer(2), row.bytes(3)});
+  });
+}
+
+bool StoreReader::readRtcSessions(const EventFilter& filter,
+                                  const std::function<void(const StoredRtcSession& session)>& take) {
+  return readRows(rtcSessionQuery(filter), filter, [&](const SqliteStatement& row) {
+    take({row.integer(0), row.number(1), row.text(2), row.text(3)});
+  });
+}
+
+bool StoreReader::readRtcMessages(const EventFilter& filter,
+                                  const std::function<void(const StoredRtcMessage& message)>& take) {
+  return readRows(rtcMessageQuery(filter), filter, [&](const SqliteStatement& row) {
+    take({row.integer(0), row.number(1), row.integer(2), row.integer(3), row.integer(4), row.text(5)});
   });
 }
 

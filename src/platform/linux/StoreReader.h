@@ -42,6 +42,24 @@ struct StoredMetric {
   std::string record;  // bytes
 };
 
+// One real-time-communication session, likewise.
+struct StoredRtcSession {
+  std::int64_t id = 0;
+  double startedAt = 0.0;
+  std::string sessionInfo;  // JSON
+  std::string userInfo;     // JSON
+};
+
+// One of its messages, likewise.
+struct StoredRtcMessage {
+  std::int64_t id = 0;
+  double sentAt = 0.0;
+  std::int64_t session = 0;  // its session's id
+  std::int64_t category = 0;
+  std::int64_t type = 0;
+  std::string payload;
+};
+
 struct EventFilter {
   std::optional<std::string> name;  // a pattern with *, ? and [...]
   std::optional<double> since;      // seconds since 1970, inclusive
@@ -69,6 +87,12 @@ class StoreReader {
 
   // Metrics have no name to choose by.
   bool readMetrics(const EventFilter& filter, const std::function<void(const StoredMetric& metric)>& take);
+
+  // A name is that of the session's service, as "telephony_session".
+  bool readRtcSessions(const EventFilter& filter,
+                       const std::function<void(const StoredRtcSession& session)>& take);
+  bool readRtcMessages(const EventFilter& filter,
+                       const std::function<void(const StoredRtcMessage& message)>& take);
 
   // Whether another file has taken the place of the one opened.
   bool hasMoved() const { return database_.hasMoved(); }

@@ -32,6 +32,7 @@ int runCommandLine(int argc, const char* const* argv, Tool& tool) {
   addEventsCommand(app, tool);
   addMetricsCommand(app, tool);
   addPowerCommand(app, tool);
+  addRtcCommand(app, tool);
   addDefaultsCommand(app, tool);
   addKillCommand(app, tool);
   try {

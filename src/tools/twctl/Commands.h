@@ -20,6 +20,7 @@ void addReplayCommand(CLI::App& app, Tool& tool);
 void addEventsCommand(CLI::App& app, Tool& tool);
 void addMetricsCommand(CLI::App& app, Tool& tool);
 void addPowerCommand(CLI::App& app, Tool& tool);
+void addRtcCommand(CLI::App& app, Tool& tool);
 void addDefaultsCommand(CLI::App& app, Tool& tool);
 void addKillCommand(CLI::App& app, Tool& tool);
 
