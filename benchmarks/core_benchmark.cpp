@@ -123,7 +123,9 @@ class ImmediateQueues final : public SerialQueueFactory {
 
 class Core {
  public:
-  Core() : context_(platform(), allWorkerClasses()) {}
+  Core()
+      : context_(doubles_.platformWith(log_, tracePoints_, clock_, queues_, metricon_, linkReport_),
+                 allWorkerClasses()) {}
 
   std::shared_ptr<TWReportingSession> makeSession(ReporterID reporterID) {
     auto session =
@@ -137,23 +139,6 @@ class Core {
   std::uint64_t events() const { return metricon_.events; }
 
  private:
-  Platform platform() {
-    return {log_,
-            tracePoints_,
-            clock_,
-            queues_,
-            doubles_.timers,
-            doubles_.processes,
-            doubles_.system,
-            doubles_.deviceFacts,
-            doubles_.preferences,
-            doubles_.files,
-            doubles_.json,
-            metricon_,
-            linkReport_,
-            "/logs"};
-  }
-
   TestPlatform doubles_;
   QuietLog log_;
   SilentTracePoints tracePoints_;

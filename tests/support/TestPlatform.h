@@ -33,9 +33,15 @@ struct TestPlatform {
   TestPlatform(const TestPlatform&) = delete;
   TestPlatform& operator=(const TestPlatform&) = delete;
 
-  Platform platform() {
-    return {log,         tracePoints, clock, queues,   timers,     processes, system,     deviceFacts,
-            preferences, files,       json,  metricon, energybook, diagwire,  linkReport, "/logs"};
+  Platform platform() { return platformWith(log, tracePoints, clock, queues, metricon, linkReport); }
+
+  // The same with other services in place of those that messages use, for benchmarks.
+  Platform platformWith(Log& otherLog, TracePoints& otherTracePoints, Clock& otherClock,
+                        SerialQueueFactory& otherQueues, Metricon& otherMetricon,
+                        LinkReport& otherLinkReport) {
+    return {otherLog,   otherTracePoints, otherClock,      otherQueues, timers, processes,
+            system,     deviceFacts,      preferences,     files,       json,   otherMetricon,
+            energybook, diagwire,         otherLinkReport, "/logs"};
   }
 
   MemoryLog log;
