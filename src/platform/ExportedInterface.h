@@ -23,6 +23,9 @@ struct Parameter {
 struct Method {
   std::string_view name;
   std::vector<Parameter> parameters;
+  // What an answer may come to. It counts against the connection's bound from the request on, since an answer
+  // is only measured when it is too late to refuse it.
+  std::size_t replyBytes = 0;
 };
 
 // The request set of an exported object. A request names its method by the place in `methods`.

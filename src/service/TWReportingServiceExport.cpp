@@ -21,6 +21,9 @@ enum ServiceMethod : std::size_t {
   kKillService,
 };
 
+// Of a list of reporter identifiers: what some ten clients with all the sessions they may have come to.
+constexpr std::size_t kMostListBytes = std::size_t{512} << 10;
+
 ReporterID reporterIDOf(const Argument& argument) { return argument->integer(); }
 AudioServiceType serviceTypeOf(const Argument& argument) {
   return static_cast<AudioServiceType>(argument->integer());
@@ -55,7 +58,7 @@ const ExportedInterface& TWReportingServiceExport::exportedInterface() {
             {"type", ParameterType::kUInt16},
             {"reporterIDs", ParameterType::kInt64ListOrNone}}},
           {"stopReportingSessionForID", {kReporterID}}, {"destroyReportingSession", {kReporterID}},
-          {"reporterIDValid", {kReporterID}}, {"getAllReporters", {}}, {"killService", {}},
+          {"reporterIDValid", {kReporterID}}, {"getAllReporters", {}, kMostListBytes}, {"killService", {}},
     }
   };
   return interface;

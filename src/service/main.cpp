@@ -141,6 +141,7 @@ int run() {
   const sigset_t signals = endSignals();
   pthread_sigmask(SIG_BLOCK, &signals, nullptr);
   std::signal(SIGPIPE, SIG_IGN);
+  std::signal(SIGXFSZ, SIG_IGN);  // a file that may not grow is a write that fails
   raiseDescriptorLimit();
 
   const Directories directories = Directories::fromEnvironment();

@@ -73,7 +73,7 @@ TEST(ExportedInterfaceTest, AListOfIntegersMayBeNilOrEmpty) {
   expectSuits(kType, Value(ValueArray{kLeast, 0U, kMost}));
   expectRefused(kType, Value(ValueArray{1, 2.0}));
   expectRefused(kType, Value(ValueArray{static_cast<std::uint64_t>(kMost) + 1}));
-  expectRefused(kType, Value(ValueArray{ValueArray()}));
+  expectRefused(kType, Value(ValueArray(std::vector<Value>{Value(ValueArray())})));
   expectRefused(kType, Value(1));
   expectRefused(kType, Value(ValueMap()));
 }

@@ -130,7 +130,7 @@ void UnixConnection::dispatch(RpcFrame& frame) {
   const std::optional<std::size_t> method = interface_->find(frame.method);
   Reply reply = frame.kind == RpcFrame::Kind::kRequest ? Reply(outbox_, frame.identifier) : Reply();
   if (const auto problem = problemWithFrame(frame, method)) return reply(problem);
-  RequestToken token = load_->start(bytesHeldBy(frame));
+  RequestToken token = load_->start(bytesHeldBy(frame) + interface_->methods[*method].replyBytes);
   object_->handleRequest(*method, std::move(frame.arguments), std::move(reply), std::move(token));
 }
 

@@ -41,6 +41,7 @@ inline const ExportedInterface& rigInterface() {
           {"hold", {{"number", ParameterType::kInt64}}},       // keeps token and reply
           {"holdReply", {{"number", ParameterType::kInt64}}},  // keeps the reply alone
           {"holdMap", {{"map", ParameterType::kMap}}},         // keeps token and reply
+          {"holdLarge", {}, std::size_t{1} << 20},             // likewise; its answer may come to a MiB
     }
   };
   return interface;
@@ -120,7 +121,8 @@ class RigObject final : public ExportedObject {
     record_.add(ReceivedRequest{name, std::move(arguments)});
     if (name == "echo") return reply(std::nullopt, first);
     if (name == "fail") return reply(ReplyError{"com.example", 7, ""});
-    if (name == "hold" || name == "holdMap") return record_.hold(std::move(reply), std::move(token));
+    if (name == "hold" || name == "holdMap" || name == "holdLarge")
+      return record_.hold(std::move(reply), std::move(token));
     if (name == "holdReply") return record_.hold(std::move(reply), RequestToken());
     if (name != "answerTwice") return reply(std::nullopt);
     reply(std::nullopt, Value(1));

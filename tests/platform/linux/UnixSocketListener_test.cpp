@@ -332,6 +332,21 @@ TEST_F(UnixSocketListenerTest, ReadsNoFurtherThanTheBoundOfUnfinishedBytes) {
   sender.join();
 }
 
+TEST_F(UnixSocketListenerTest, CountsWhatAnAnswerMayComeToFromTheRequestOn) {
+  RawClient client(path);
+  std::string frames;
+  for (int at = 0; at < 20; ++at) frames += notificationOf("holdLarge", {});
+  ASSERT_TRUE(client.send(frames));
+  ASSERT_TRUE(record.waitForHeld(4));
+  RawClient other(path);
+  expectServed(other);
+  EXPECT_EQ(record.heldCount(), 4U);
+  for (std::size_t taken = 0; taken < 20;) {
+    ASSERT_TRUE(record.waitForHeld(1));
+    taken += record.takeHeld().size();
+  }
+}
+
 TEST_F(UnixSocketListenerTest, DoesNotCountARequestWhoseReplyAloneIsHeldBack) {
   RawClient client(path);
   constexpr std::size_t kSent = 3 * kMostUnfinishedRequests;
