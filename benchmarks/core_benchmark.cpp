@@ -7,6 +7,7 @@
 #include <benchmark/benchmark.h>
 #include <chrono>
 #include <cstdint>
+#include <malloc.h>
 #include <memory>
 #include <optional>
 #include <string>
@@ -268,8 +269,31 @@ void Stop(benchmark::State& state) {
     session->stop();
   }
   state.SetItemsProcessed(state.iterations() * state.range(0));
+  state.SetComplexityN(state.range(0));
 }
-BENCHMARK(Stop)->ArgName("stored")->Arg(1)->Arg(1000)->Arg(100'000)->Unit(benchmark::kMicrosecond);
+// Its growth is shown beside n log n, which it must not pass.
+BENCHMARK(Stop)
+    ->ArgName("stored")
+    ->Arg(1000)
+    ->Arg(10'000)
+    ->Arg(100'000)
+    ->Unit(benchmark::kMicrosecond)
+    ->Complexity(benchmark::oNLogN);
+
+// What a stored message takes of the heap, payload, record and places included. The time is of no interest.
+void KeepMessages(benchmark::State& state) {
+  constexpr std::size_t kStored = 100'000;
+  const auto keys = static_cast<std::size_t>(state.range(0));
+  Core core;
+  for (auto _ : state) {
+    const auto session = core.makeSession(77);
+    const std::size_t before = mallinfo2().uordblks;
+    fill(*session, kStored, keys);
+    const std::size_t after = mallinfo2().uordblks;
+    state.counters["bytes_a_message"] = static_cast<double>(after - before) / static_cast<double>(kStored);
+  }
+}
+BENCHMARK(KeepMessages)->ArgName("keys")->Arg(8)->Arg(64)->Iterations(1)->Unit(benchmark::kMillisecond);
 
 // A payload's map by itself.
 void MakePayload(benchmark::State& state) {
