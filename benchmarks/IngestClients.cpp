@@ -42,12 +42,13 @@ void waitFor(std::vector<pollfd>& sockets) {
 
 }  // namespace
 
-IngestClients::IngestClients(const std::string& socketPath, std::size_t count, IngestMessages::Kind kind) {
+IngestClients::IngestClients(const std::string& socketPath, std::size_t count, IngestMessages::Kind kind,
+                             std::int64_t serviceType) {
   for (std::size_t at = 0; at < count; ++at) {
     const std::int64_t reporterID = kFirstReporterID + static_cast<std::int64_t>(at);
     clients_.push_back(
         {connectTo(socketPath), IngestMessages(kind, reporterID, kDifferentMessages), "", 0, 0, 0, ""});
-    ask(clients_.back(), IngestMessages::opening(reporterID));
+    ask(clients_.back(), IngestMessages::opening(reporterID, serviceType));
   }
 }
 

@@ -19,8 +19,9 @@ namespace tonewerk {
 // refused has measured nothing.
 class IngestClients {
  public:
-  // Connects `count` clients to the socket and starts a session for each.
-  IngestClients(const std::string& socketPath, std::size_t count, IngestMessages::Kind kind);
+  // Connects `count` clients to the socket and starts a session of that service for each.
+  IngestClients(const std::string& socketPath, std::size_t count, IngestMessages::Kind kind,
+                std::int64_t serviceType);
 
   struct Pace {
     std::size_t window;          // requests under way, a client

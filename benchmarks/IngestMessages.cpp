@@ -13,7 +13,6 @@ namespace {
 
 constexpr std::uint32_t kPlayback = 4;
 constexpr std::uint16_t kGeneric = 0;
-constexpr std::int64_t kLongFormAudio = 7;
 
 double now() {
   return std::chrono::duration<double>(std::chrono::system_clock::now().time_since_epoch()).count();
@@ -46,12 +45,12 @@ IngestMessages::IngestMessages(Kind kind, std::int64_t reporterID, std::size_t c
   }
 }
 
-std::string IngestMessages::opening(std::int64_t reporterID) {
+std::string IngestMessages::opening(std::int64_t reporterID, std::int64_t serviceType) {
   std::string bytes;
   RpcWriter writer(bytes);
   const Value session(reporterID);
   writer.notification("createReportingSession", {session});
-  writer.notification("setServiceType", {Value(kLongFormAudio), session});
+  writer.notification("setServiceType", {Value(serviceType), session});
   writer.notification("startReportingSessionForID", {session});
   writer.request(kFirstIdentifier, "setConfiguration",
                  {Value(ValueMap{{"HostApplicationDisplayID", "com.example.player"}}), session});

@@ -24,7 +24,7 @@ class IngestMessages {
   IngestMessages(Kind kind, std::int64_t reporterID, std::size_t count);
 
   // Makes the session and starts it: three notifications, then a request, answered when all have run.
-  static std::string opening(std::int64_t reporterID);
+  static std::string opening(std::int64_t reporterID, std::int64_t serviceType);
   // Stops it: one request.
   static std::string closing(std::int64_t reporterID);
 

@@ -13,6 +13,10 @@ namespace {
 
 constexpr std::size_t kFillWindow = 256;
 
+// Service types. Sessions of the test service have every worker but that of real-time communication.
+constexpr std::int64_t kLongFormAudio = 7;
+constexpr std::int64_t kTest = 11;
+
 void start(ServerProcess& server, IngestSide side) {
   if (side == IngestSide::kFloor) return server.start(TONEWERK_FLOOR, {server.socketPath()});
   // On internal builds every session gets a summary file, too.
@@ -44,7 +48,8 @@ std::size_t rowsOf(const IngestScenario& scenario) {
 IngestCost measureIngest(const IngestScenario& scenario, IngestSide side) {
   ServerProcess server;
   start(server, side);
-  IngestClients clients(server.socketPath(), scenario.clients, scenario.kind);
+  IngestClients clients(server.socketPath(), scenario.clients, scenario.kind,
+                        scenario.recordsCalls ? kLongFormAudio : kTest);
   clients.send(scenario.storedBefore / scenario.clients, {kFillWindow, kFillWindow});
   server.waitUntilIdle();
 

@@ -19,10 +19,12 @@ struct IngestScenario {
   std::size_t messagesAWrite;  // at most; a client library writes each by itself
   std::size_t messages;        // measured ones, of all clients together
   std::size_t storedBefore;    // messages that come before the measured ones, likewise
+  // A session's real-time-communication records are a second row a message.
+  bool recordsCalls = false;
 };
 
 enum class IngestSide {
-  kDaemon,  // with every worker, the report store and the summary files
+  kDaemon,  // recording analytics events in its store, and summary files
   kFloor,
 };
 

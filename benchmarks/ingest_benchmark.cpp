@@ -46,6 +46,7 @@ const std::vector<IngestScenario>& scenarios() {
       {"8 clients, redundant", 8, kRedundant, kWindow, 1, kMessages, 0},
       {"1 client, changing, 128 a write", 1, kChanging, kWindow, kBatch, kMessages, 0},
       {"1 client, redundant, 128 a write", 1, kRedundant, kWindow, kBatch, kMessages, 0},
+      {"1 client, changing, call records", 1, kChanging, kWindow, 1, kMessages, 0, true},
   };
   return all;
 }
