@@ -77,8 +77,15 @@ TEST(CompactJsonTest, EscapesWhereverInATextItStands) {
       const std::string before = plain.substr(0, at);
       const std::string after = plain.substr(at);
       const std::string escaped = *character == '\x1f' ? "\\u001f" : "\\" + std::string(character);
-      EXPECT_EQ(ValueMap({{"k", before + character + after}}).text(),
-                "{\"k\":\"" + before + escaped + after + "\"}");
+      std::string value = before;
+      value += character;
+      value += after;
+      std::string expected = "{\"k\":\"";
+      expected += before;
+      expected += escaped;
+      expected += after;
+      expected += "\"}";
+      EXPECT_EQ(ValueMap({{"k", value}}).text(), expected);
     }
   }
 }
