@@ -24,7 +24,10 @@ const Value* valueOf(const ValueMap& message, std::string_view key) {
 
 // The record's fields end at a zero byte, as C strings do.
 void setBytes(std::string& field, const ValueMap& message, std::string_view key) {
-  if (const Value* value = valueOf(message, key)) field = value->text().c_str();
+  const Value* value = valueOf(message, key);
+  if (value == nullptr) return;
+  const std::string text = value->text();
+  field = text.substr(0, text.find('\0'));
 }
 
 }  // namespace
