@@ -13,6 +13,7 @@
 #include "platform/SerialQueue.h"
 #include "session/AudioEvent.h"
 #include "session/PrivateQueues.h"
+#include "session/ProcessSingles.h"
 #include "session/SinkQueue.h"
 #include "session/TWReportingNameTable.h"
 #include "session/TWReportingSessionWorkerRegistry.h"
@@ -54,6 +55,9 @@ class TWReportingContext {
   // Filled by the first session.
   const TWReportingSessionWorkerRegistry& workerRegistry();
 
+  // What rooms above this one have one of. Ends after the queues made here.
+  ProcessSingles& singles() { return singles_; }
+
   // On the work queue.
   TWReportingNameTable& names() { return names_; }
 
@@ -81,6 +85,7 @@ class TWReportingContext {
  private:
   const Platform platform_;
   TWReportingNameTable names_;
+  ProcessSingles singles_;
 
   std::once_flag internalBuildOnce_;
   bool isInternalBuild_ = false;

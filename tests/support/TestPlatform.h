@@ -39,9 +39,22 @@ struct TestPlatform {
   Platform platformWith(Log& otherLog, TracePoints& otherTracePoints, Clock& otherClock,
                         SerialQueueFactory& otherQueues, Metricon& otherMetricon,
                         LinkReport& otherLinkReport) {
-    return {otherLog,   otherTracePoints, otherClock,      otherQueues, timers, processes,
-            system,     deviceFacts,      preferences,     files,       json,   otherMetricon,
-            energybook, diagwire,         otherLinkReport, "/logs"};
+    return {.log = otherLog,
+            .tracePoints = otherTracePoints,
+            .clock = otherClock,
+            .queues = otherQueues,
+            .timers = timers,
+            .processes = processes,
+            .system = system,
+            .deviceFacts = deviceFacts,
+            .preferences = preferences,
+            .files = files,
+            .json = json,
+            .metricon = otherMetricon,
+            .energybook = energybook,
+            .diagwire = diagwire,
+            .linkReport = otherLinkReport,
+            .logsDirectory = "/logs"};
   }
 
   MemoryLog log;

@@ -66,9 +66,22 @@ JsonService& LinuxPlatform::json() { return adapters_->json; }
 Platform LinuxPlatform::platform(Metricon& metricon, Energybook& energybook, Diagwire& diagwire,
                                  LinkReport& linkReport) {
   Adapters& a = *adapters_;
-  return {*a.log,     a.tracePoints, a.clock,       a.queues,       a.timers, a.processes,
-          a.system,   a.deviceFacts, a.preferences, a.files,        a.json,   metricon,
-          energybook, diagwire,      linkReport,    a.logsDirectory};
+  return {.log = *a.log,
+          .tracePoints = a.tracePoints,
+          .clock = a.clock,
+          .queues = a.queues,
+          .timers = a.timers,
+          .processes = a.processes,
+          .system = a.system,
+          .deviceFacts = a.deviceFacts,
+          .preferences = a.preferences,
+          .files = a.files,
+          .json = a.json,
+          .metricon = metricon,
+          .energybook = energybook,
+          .diagwire = diagwire,
+          .linkReport = linkReport,
+          .logsDirectory = a.logsDirectory};
 }
 
 }  // namespace tonewerk

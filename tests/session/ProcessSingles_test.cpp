@@ -1,0 +1,61 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "session/ProcessSingles.h"
+
+#include <gmock/gmock.h>
+#include <string>
+#include <thread>
+
+namespace tonewerk {
+namespace {
+
+using ::testing::ElementsAre;
+
+std::vector<std::string> ends;
+
+struct First {
+  explicit First(int number) : value(number) {}
+  ~First() { ends.emplace_back("first"); }
+  int value;
+};
+
+struct Second {
+  explicit Second(ProcessSingles& singles) : value(singles.get<First>(5).value + 1) {}
+  ~Second() { ends.emplace_back("second"); }
+  int value;
+};
+
+TEST(ProcessSinglesTest, MakesEachOnceAndGivesTheSameAgain) {
+  ProcessSingles singles;
+  First& first = singles.get<First>(1);
+  EXPECT_EQ(&singles.get<First>(2), &first);
+  EXPECT_EQ(first.value, 1);
+}
+
+TEST(ProcessSinglesTest, FindsNothingBeforeItWasAskedFor) {
+  ProcessSingles singles;
+  EXPECT_EQ(singles.find<First>(), nullptr);
+  First& first = singles.get<First>(1);
+  EXPECT_EQ(singles.find<First>(), &first);
+}
+
+TEST(ProcessSinglesTest, OneMayNeedAnotherAndEndsBeforeIt) {
+  ends.clear();
+  {
+    ProcessSingles singles;
+    EXPECT_EQ(singles.get<Second>(singles).value, 6);
+  }
+  EXPECT_THAT(ends, ElementsAre("second", "first"));
+}
+
+TEST(ProcessSinglesTest, ThreadsThatAskTogetherGetTheSame) {
+  ProcessSingles singles;
+  First* seen[2] = {};
+  std::thread one([&] { seen[0] = &singles.get<First>(1); });
+  std::thread other([&] { seen[1] = &singles.get<First>(2); });
+  one.join();
+  other.join();
+  EXPECT_EQ(seen[0], seen[1]);
+}
+
+}  // namespace
+}  // namespace tonewerk
