@@ -10,6 +10,7 @@ class DeviceFacts;
 class Diagwire;
 class Energybook;
 class FileSystem;
+class IssueDraftService;
 class JsonService;
 class LinkReport;
 class Log;
@@ -20,6 +21,7 @@ class SerialQueueFactory;
 class SystemInformation;
 class TimerService;
 class TracePoints;
+class WhirlcapRequest;
 
 // The operating system's services, as the core sees them. Everything referred to outlives the core.
 struct Platform {
@@ -38,6 +40,8 @@ struct Platform {
   Energybook& energybook;
   Diagwire& diagwire;
   LinkReport& linkReport;
+  IssueDraftService& issueDrafts;
+  WhirlcapRequest& whirlcaps;
   // Where reports for people go; absolute.
   std::string logsDirectory = {};
 };

@@ -9,6 +9,7 @@
 #include "support/MemoryDiagwire.h"
 #include "support/MemoryEnergybook.h"
 #include "support/MemoryFileSystem.h"
+#include "support/MemoryIssueDraftService.h"
 #include "support/MemoryJsonService.h"
 #include "support/MemoryLinkReport.h"
 #include "support/MemoryLog.h"
@@ -17,6 +18,7 @@
 #include "support/MemoryProcessInformation.h"
 #include "support/MemorySystemInformation.h"
 #include "support/MemoryTracePoints.h"
+#include "support/MemoryWhirlcapRequest.h"
 
 namespace tonewerk {
 
@@ -54,6 +56,8 @@ struct TestPlatform {
             .energybook = energybook,
             .diagwire = diagwire,
             .linkReport = otherLinkReport,
+            .issueDrafts = issueDrafts,
+            .whirlcaps = whirlcaps,
             .logsDirectory = "/logs"};
   }
 
@@ -72,6 +76,8 @@ struct TestPlatform {
   MemoryEnergybook energybook;
   MemoryDiagwire diagwire;
   MemoryLinkReport linkReport;
+  MemoryIssueDraftService issueDrafts;
+  MemoryWhirlcapRequest whirlcaps;
 };
 
 }  // namespace tonewerk

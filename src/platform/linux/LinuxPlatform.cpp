@@ -7,8 +7,10 @@
 #include "platform/LogCategory.h"
 #include "platform/linux/Directories.h"
 #include "platform/linux/LinuxFileSystem.h"
+#include "platform/linux/LinuxIssueDraftService.h"
 #include "platform/linux/LinuxProcessInformation.h"
 #include "platform/linux/LinuxSystemInformation.h"
+#include "platform/linux/LinuxWhirlcapRequest.h"
 #include "platform/linux/NlohmannJsonService.h"
 #include "platform/linux/StandardLog.h"
 #include "platform/linux/SystemClock.h"
@@ -50,6 +52,8 @@ struct LinuxPlatform::Adapters {
   TomlPreferenceStore preferences;
   LinuxFileSystem files;
   NlohmannJsonService json;
+  LinuxIssueDraftService issueDrafts{queues};
+  LinuxWhirlcapRequest whirlcaps{category};
 };
 
 LinuxPlatform::LinuxPlatform(const Directories& directories)
@@ -81,6 +85,8 @@ Platform LinuxPlatform::platform(Metricon& metricon, Energybook& energybook, Dia
           .energybook = energybook,
           .diagwire = diagwire,
           .linkReport = linkReport,
+          .issueDrafts = a.issueDrafts,
+          .whirlcaps = a.whirlcaps,
           .logsDirectory = a.logsDirectory};
 }
 

@@ -1,0 +1,43 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstddef>
+#include <deque>
+#include <mutex>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "platform/IssueDraftService.h"
+
+namespace tonewerk {
+
+// Keeps the drafts that were handed over, and answers for one when it is told to. Any thread.
+//
+//   EXPECT_THAT(test.issueDrafts.requests(), SizeIs(1));
+//   test.issueDrafts.answerNext();                          // made
+//   test.issueDrafts.answerNext("the disk is full");        // not made; without a call, no answer ever
+class MemoryIssueDraftService final : public IssueDraftService {
+ public:
+  struct Request {
+    TrackletDraft draft;
+    std::optional<std::string> processName;
+    std::string displayReason;
+  };
+
+  void createDraft(TrackletDraft draft, std::optional<std::string> processName, std::string displayReason,
+                   CompletionHandler completionHandler) override;
+
+  std::vector<Request> requests() const;
+  // Requests that nobody has answered.
+  std::size_t unanswered() const;
+  // Runs the oldest unanswered request's handler here. False when there is none.
+  bool answerNext(const std::optional<std::string>& error = std::nullopt);
+
+ private:
+  mutable std::mutex mutex_;  // guards what follows
+  std::vector<Request> requests_;
+  std::deque<CompletionHandler> waiting_;
+};
+
+}  // namespace tonewerk

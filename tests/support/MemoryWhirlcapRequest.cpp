@@ -1,0 +1,30 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "support/MemoryWhirlcapRequest.h"
+
+#include <utility>
+
+namespace tonewerk {
+
+void MemoryWhirlcapRequest::request(std::string requester, std::string reason, std::string description,
+                                    ValueMap payload, Flags flags) {
+  std::function<void()> observer;
+  {
+    const std::lock_guard lock(mutex_);
+    requests_.push_back(
+        {std::move(requester), std::move(reason), std::move(description), std::move(payload), flags});
+    observer = observer_;
+  }
+  if (observer) observer();
+}
+
+std::vector<MemoryWhirlcapRequest::Request> MemoryWhirlcapRequest::requests() const {
+  const std::lock_guard lock(mutex_);
+  return requests_;
+}
+
+void MemoryWhirlcapRequest::onRequest(std::function<void()> observer) {
+  const std::lock_guard lock(mutex_);
+  observer_ = std::move(observer);
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,39 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <functional>
+#include <mutex>
+#include <string>
+#include <vector>
+
+#include "platform/WhirlcapRequest.h"
+
+namespace tonewerk {
+
+// Keeps the stall traces that were requested. Any thread.
+//
+//   EXPECT_THAT(test.whirlcaps.requests(), SizeIs(1));
+//   test.whirlcaps.onRequest([&] { ... });     // a look at the world at the moment of each request
+class MemoryWhirlcapRequest final : public WhirlcapRequest {
+ public:
+  struct Request {
+    std::string requester;
+    std::string reason;
+    std::string description;
+    ValueMap payload;
+    Flags flags;
+  };
+
+  void request(std::string requester, std::string reason, std::string description, ValueMap payload,
+               Flags flags) override;
+
+  std::vector<Request> requests() const;
+  void onRequest(std::function<void()> observer);
+
+ private:
+  mutable std::mutex mutex_;  // guards what follows
+  std::vector<Request> requests_;
+  std::function<void()> observer_;
+};
+
+}  // namespace tonewerk
