@@ -6,6 +6,7 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <string_view>
 
 namespace tonewerk {
 
@@ -40,22 +41,23 @@ class ChanmeterSubscription {
 };
 
 // One channel's value in a set of samples. Units are the driver's; the label says which. Where a question
-// does not fit the sample's format, or an index is out of range, the answer is 0 or empty.
+// does not fit the sample's format, or an index is out of range, the answer is 0 or empty. Texts live as long
+// as the sample does.
 class ChanmeterSample {
  public:
   virtual ~ChanmeterSample() = default;
 
   virtual ChanmeterFormat format() const = 0;
-  virtual std::optional<std::string> group() const = 0;
-  virtual std::optional<std::string> subGroup() const = 0;
-  virtual std::optional<std::string> driverName() const = 0;
-  virtual std::optional<std::string> channelName() const = 0;
-  virtual std::optional<std::string> unitLabel() const = 0;
+  virtual std::optional<std::string_view> group() const = 0;
+  virtual std::optional<std::string_view> subGroup() const = 0;
+  virtual std::optional<std::string_view> driverName() const = 0;
+  virtual std::optional<std::string_view> channelName() const = 0;
+  virtual std::optional<std::string_view> unitLabel() const = 0;
 
   virtual std::int64_t simpleIntegerValue() const = 0;
 
   virtual std::int32_t stateCount() const = 0;
-  virtual std::string stateName(std::int32_t index) const = 0;
+  virtual std::string_view stateName(std::int32_t index) const = 0;
   virtual std::uint64_t stateInTransitions(std::int32_t index) const = 0;
   virtual std::uint64_t stateResidency(std::int32_t index) const = 0;
   virtual double stateDutyCycle(std::int32_t index) const = 0;

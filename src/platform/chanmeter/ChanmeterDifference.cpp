@@ -1,0 +1,80 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/chanmeter/ChanmeterDifference.h"
+
+#include <limits>
+#include <tuple>
+
+#include "platform/chanmeter/Counterparts.h"
+
+namespace tonewerk {
+namespace {
+
+std::int64_t saturatingDifference(std::int64_t later, std::int64_t earlier) {
+  using Limits = std::numeric_limits<std::int64_t>;
+  if (earlier < 0 && later > Limits::max() + earlier) return Limits::max();
+  if (earlier > 0 && later < Limits::min() + earlier) return Limits::min();
+  return later - earlier;
+}
+
+// Counters that went back began anew.
+std::uint64_t counted(std::uint64_t later, std::uint64_t earlier) {
+  return later >= earlier ? later - earlier : later;
+}
+
+std::int64_t counted(std::int64_t later, std::int64_t earlier) {
+  return later >= earlier ? saturatingDifference(later, earlier) : later;
+}
+
+void recomputeDutyCycles(std::vector<ChanmeterState>& states) {
+  double sum = 0;  // wide enough for any residencies' sum
+  for (const ChanmeterState& state : states) sum += static_cast<double>(state.residency);
+  for (ChanmeterState& state : states) {
+    state.dutyCycle = sum > 0 ? static_cast<double>(state.residency) / sum : 0.0;
+  }
+}
+
+void subtractStates(std::vector<ChanmeterState>& states, const std::vector<ChanmeterState>& earlier) {
+  const auto before = counterparts(
+      earlier, states, [](const ChanmeterState& state) -> const std::string& { return state.name; });
+  for (std::size_t i = 0; i < states.size(); ++i) {
+    if (before[i] == nullptr) continue;
+    states[i].transitions = counted(states[i].transitions, before[i]->transitions);
+    states[i].residency = counted(states[i].residency, before[i]->residency);
+  }
+  recomputeDutyCycles(states);
+}
+
+void subtractBuckets(std::vector<ChanmeterBucket>& buckets, const std::vector<ChanmeterBucket>& earlier) {
+  const auto before = counterparts(
+      earlier, buckets, [](const ChanmeterBucket& bucket) { return std::tie(bucket.lower, bucket.upper); });
+  for (std::size_t i = 0; i < buckets.size(); ++i) {
+    if (before[i] != nullptr) buckets[i].hits = counted(buckets[i].hits, before[i]->hits);
+  }
+}
+
+std::shared_ptr<const ChanmeterRecord> differenceOf(const ChanmeterRecord& earlier,
+                                                    const std::shared_ptr<const ChanmeterRecord>& later) {
+  if (later->format < kChanmeterFormatSimple || later->format > kChanmeterFormatHistogram) return later;
+  auto change = std::make_shared<ChanmeterRecord>(*later);
+  if (change->format == kChanmeterFormatSimple)
+    change->value = saturatingDifference(later->value, earlier.value);
+  if (change->format == kChanmeterFormatState) subtractStates(change->states, earlier.states);
+  if (change->format == kChanmeterFormatHistogram) subtractBuckets(change->buckets, earlier.buckets);
+  return change;
+}
+
+}  // namespace
+
+ChanmeterRecords chanmeterDifference(const ChanmeterRecords& earlier, const ChanmeterRecords& later) {
+  const auto before = counterparts(earlier, later, [](const std::shared_ptr<const ChanmeterRecord>& record) {
+    return std::tie(record->key, record->format);
+  });
+  ChanmeterRecords changes;
+  changes.reserve(later.size());
+  for (std::size_t i = 0; i < later.size(); ++i) {
+    if (before[i] != nullptr) changes.push_back(differenceOf(**before[i], later[i]));
+  }
+  return changes;
+}
+
+}  // namespace tonewerk

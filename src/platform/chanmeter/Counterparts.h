@@ -1,0 +1,43 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <algorithm>
+#include <cstddef>
+#include <vector>
+
+namespace tonewerk {
+
+// For each of `later` what it was in `earlier`, by equal keys: the n-th with a key goes with the n-th with
+// that key. Null for what was not there. Points into `earlier`. O(n log n), and O(n) as far as both begin
+// with the same keys, as they do when nothing came or went.
+template <typename T, typename KeyOf>
+std::vector<const T*> counterparts(const std::vector<T>& earlier, const std::vector<T>& later,
+                                   const KeyOf& keyOf) {
+  std::vector<const T*> found(later.size(), nullptr);
+  const std::size_t shorter = std::min(earlier.size(), later.size());
+  std::size_t begin = 0;
+  for (; begin < shorter && keyOf(earlier[begin]) == keyOf(later[begin]); ++begin)
+    found[begin] = &earlier[begin];
+
+  const auto sortedRest = [&](const std::vector<T>& items) {
+    std::vector<const T*> rest;
+    for (std::size_t i = begin; i < items.size(); ++i) rest.push_back(&items[i]);
+    std::stable_sort(rest.begin(), rest.end(), [&](const T* a, const T* b) { return keyOf(*a) < keyOf(*b); });
+    return rest;
+  };
+  const std::vector<const T*> before = sortedRest(earlier);
+  const std::vector<const T*> after = sortedRest(later);
+  auto b = before.begin();
+  for (auto a = after.begin(); a != after.end() && b != before.end();) {
+    if (keyOf(**b) < keyOf(**a)) {
+      ++b;
+    } else if (keyOf(**a) < keyOf(**b)) {
+      ++a;
+    } else {
+      found[static_cast<std::size_t>(*a++ - later.data())] = *b++;
+    }
+  }
+  return found;
+}
+
+}  // namespace tonewerk
