@@ -5,6 +5,7 @@
 
 namespace tonewerk {
 
+class Chanmeter;
 class Clock;
 class DeviceFacts;
 class Diagwire;
@@ -42,6 +43,7 @@ struct Platform {
   LinkReport& linkReport;
   IssueDraftService& issueDrafts;
   WhirlcapRequest& whirlcaps;
+  Chanmeter& chanmeter;
   // Where reports for people go; absolute.
   std::string logsDirectory = {};
 };

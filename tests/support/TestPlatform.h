@@ -5,6 +5,7 @@
 #include "support/ManualClock.h"
 #include "support/ManualQueues.h"
 #include "support/ManualTimers.h"
+#include "support/MemoryChanmeter.h"
 #include "support/MemoryDeviceFacts.h"
 #include "support/MemoryDiagwire.h"
 #include "support/MemoryEnergybook.h"
@@ -58,6 +59,7 @@ struct TestPlatform {
             .linkReport = otherLinkReport,
             .issueDrafts = issueDrafts,
             .whirlcaps = whirlcaps,
+            .chanmeter = chanmeter,
             .logsDirectory = "/logs"};
   }
 
@@ -78,6 +80,7 @@ struct TestPlatform {
   MemoryLinkReport linkReport;
   MemoryIssueDraftService issueDrafts;
   MemoryWhirlcapRequest whirlcaps;
+  MemoryChanmeter chanmeter;
 };
 
 }  // namespace tonewerk

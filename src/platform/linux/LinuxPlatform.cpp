@@ -6,6 +6,7 @@
 
 #include "platform/LogCategory.h"
 #include "platform/linux/Directories.h"
+#include "platform/linux/LinuxChanmeter.h"
 #include "platform/linux/LinuxFileSystem.h"
 #include "platform/linux/LinuxIssueDraftService.h"
 #include "platform/linux/LinuxProcessInformation.h"
@@ -54,6 +55,7 @@ struct LinuxPlatform::Adapters {
   NlohmannJsonService json;
   LinuxIssueDraftService issueDrafts{queues};
   LinuxWhirlcapRequest whirlcaps{category};
+  LinuxChanmeter chanmeter;
 };
 
 LinuxPlatform::LinuxPlatform(const Directories& directories)
@@ -87,6 +89,7 @@ Platform LinuxPlatform::platform(Metricon& metricon, Energybook& energybook, Dia
           .linkReport = linkReport,
           .issueDrafts = a.issueDrafts,
           .whirlcaps = a.whirlcaps,
+          .chanmeter = a.chanmeter,
           .logsDirectory = a.logsDirectory};
 }
 
