@@ -16,6 +16,7 @@ class JsonService;
 class LinkReport;
 class Log;
 class Metricon;
+class NotificationService;
 class PreferenceStore;
 class ProcessInformation;
 class SerialQueueFactory;
@@ -35,6 +36,7 @@ struct Platform {
   SystemInformation& system;
   DeviceFacts& deviceFacts;
   PreferenceStore& preferences;
+  NotificationService& notifications;
   FileSystem& files;
   JsonService& json;
   Metricon& metricon;

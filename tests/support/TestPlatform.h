@@ -15,6 +15,7 @@
 #include "support/MemoryLinkReport.h"
 #include "support/MemoryLog.h"
 #include "support/MemoryMetricon.h"
+#include "support/MemoryNotificationService.h"
 #include "support/MemoryPreferenceStore.h"
 #include "support/MemoryProcessInformation.h"
 #include "support/MemorySystemInformation.h"
@@ -51,6 +52,7 @@ struct TestPlatform {
             .system = system,
             .deviceFacts = deviceFacts,
             .preferences = preferences,
+            .notifications = notifications,
             .files = files,
             .json = json,
             .metricon = otherMetricon,
@@ -72,6 +74,7 @@ struct TestPlatform {
   MemorySystemInformation system;
   MemoryDeviceFacts deviceFacts;
   MemoryPreferenceStore preferences;
+  MemoryNotificationService notifications;
   MemoryFileSystem files;
   MemoryJsonService json;
   MemoryMetricon metricon;

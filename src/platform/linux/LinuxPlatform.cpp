@@ -6,6 +6,7 @@
 
 #include "platform/LogCategory.h"
 #include "platform/linux/Directories.h"
+#include "platform/linux/InotifyNotificationService.h"
 #include "platform/linux/LinuxChanmeter.h"
 #include "platform/linux/LinuxFileSystem.h"
 #include "platform/linux/LinuxIssueDraftService.h"
@@ -37,8 +38,8 @@ struct LinuxPlatform::Adapters {
   explicit Adapters(const Directories& directories)
       : logsDirectory(absolutePath(directories.logs)),
         deviceFacts(directories.configuration + "/device-facts.toml", category),
-        preferences(directories.configuration + "/preferences", directories.state + "/preferences",
-                    category) {}
+        preferences(directories.configuration + "/preferences", directories.state + "/preferences", category),
+        notifications(directories.runtime + "/notifications", category) {}
 
   const std::string logsDirectory;
   SystemClock clock;
@@ -51,6 +52,7 @@ struct LinuxPlatform::Adapters {
   LinuxSystemInformation system{clock};
   TomlDeviceFacts deviceFacts;
   TomlPreferenceStore preferences;
+  InotifyNotificationService notifications;
   LinuxFileSystem files;
   NlohmannJsonService json;
   LinuxIssueDraftService issueDrafts{queues};
@@ -81,6 +83,7 @@ Platform LinuxPlatform::platform(Metricon& metricon, Energybook& energybook, Dia
           .system = a.system,
           .deviceFacts = a.deviceFacts,
           .preferences = a.preferences,
+          .notifications = a.notifications,
           .files = a.files,
           .json = a.json,
           .metricon = metricon,

@@ -1,0 +1,147 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/DirectoryWatcher.h"
+
+#include <algorithm>
+#include <array>
+#include <cerrno>
+#include <cstddef>
+#include <cstdint>
+#include <cstring>
+#include <filesystem>
+#include <poll.h>
+#include <sys/eventfd.h>
+#include <sys/inotify.h>
+#include <sys/stat.h>
+#include <system_error>
+#include <unistd.h>
+#include <utility>
+
+#include "platform/LogLine.h"
+#include "platform/linux/ThreadProperties.h"
+
+namespace tonewerk {
+namespace {
+
+constexpr std::uint32_t kFileEvents = IN_CLOSE_WRITE | IN_MOVED_TO | IN_CREATE;
+constexpr std::uint32_t kSelfEvents = IN_DELETE_SELF | IN_MOVE_SELF;
+constexpr std::uint32_t kEntryEvents = IN_CREATE | IN_MOVED_TO | IN_MOVED_FROM | IN_DELETE;
+
+constexpr std::size_t kBufferBytes = 16 * 1024;
+
+bool holdsSomething(const std::string& path) {
+  struct stat status {};
+  return lstat(path.c_str(), &status) == 0 && S_ISREG(status.st_mode) && status.st_size > 0;
+}
+
+}  // namespace
+
+struct DirectoryWatcher::Event {
+  int watch;
+  std::uint32_t what;
+  std::string_view name;
+};
+
+DirectoryWatcher::DirectoryWatcher(std::string directory, FileHandler onFile,
+                                   std::function<void()> onEverything, const LogCategory& log)
+    : directory_(std::move(directory)),
+      parent_(std::filesystem::path(directory_).parent_path().string()),
+      name_(std::filesystem::path(directory_).filename().string()),
+      onFile_(std::move(onFile)),
+      onEverything_(std::move(onEverything)),
+      log_(log),
+      stop_(eventfd(0, EFD_CLOEXEC)),
+      inotify_(inotify_init1(IN_CLOEXEC | IN_NONBLOCK)) {
+  if (!inotify_) {
+    noteProblem(errno);
+    return;
+  }
+  attach();
+  thread_ = std::thread([this] { run(); });
+}
+
+DirectoryWatcher::~DirectoryWatcher() {
+  if (!thread_.joinable()) return;
+  eventfd_write(stop_.get(), 1);
+  thread_.join();
+}
+
+void DirectoryWatcher::run() {
+  nameThisThread("tonewerk.watch");
+  for (;;) {
+    std::array<pollfd, 2> waited = {pollfd{stop_.get(), POLLIN, 0}, pollfd{inotify_.get(), POLLIN, 0}};
+    const int timeout = mustRetry_ ? static_cast<int>(nextRetry().count()) : -1;
+    const int ready = poll(waited.data(), waited.size(), timeout);
+    if (waited[0].revents != 0) return;
+    if (ready == 0) {
+      attach();
+      if (directoryWatch_ >= 0) onEverything_();
+    } else if (ready > 0) {
+      readEvents();
+    }
+  }
+}
+
+std::chrono::milliseconds DirectoryWatcher::nextRetry() {
+  return std::exchange(retry_, std::min(2 * retry_, kLastRetry));
+}
+
+void DirectoryWatcher::readEvents() {
+  alignas(inotify_event) std::array<char, kBufferBytes> buffer;
+  const ssize_t size = read(inotify_.get(), buffer.data(), buffer.size());
+  const char* at = buffer.data();
+  const char* const end = at + std::max<ssize_t>(size, 0);
+  while (at != end) {
+    inotify_event raw{};
+    std::memcpy(&raw, at, sizeof(raw));
+    const char* const name = at + sizeof(raw);  // with zeros behind it
+    handle({raw.wd, raw.mask, std::string_view(name, strnlen(name, raw.len))});
+    at = name + raw.len;
+  }
+}
+
+void DirectoryWatcher::handle(const Event& event) {
+  const bool isOverflow = (event.what & IN_Q_OVERFLOW) != 0;
+  const bool isParent = event.watch == parentWatch_;
+  if (!isOverflow && !isParent && event.watch != directoryWatch_) return;  // of a watch given up since
+
+  const bool isSelf = (event.what & (kSelfEvents | IN_IGNORED)) != 0;
+  if (isOverflow || isSelf || (isParent && event.name == name_)) {
+    // What was lost with an overflow may be a change of the directory itself.
+    attach();
+    onEverything_();
+    return;
+  }
+  if (isParent || (event.what & IN_ISDIR) != 0) return;
+  const bool isMerelyCreated = (event.what & (IN_CLOSE_WRITE | IN_MOVED_TO)) == 0;
+  if (isMerelyCreated && !holdsSomething(directory_ + "/" + std::string(event.name))) return;
+  onFile_(event.name);
+}
+
+int DirectoryWatcher::watch(const std::string& path, std::uint32_t events, int& failure) {
+  const int watch = inotify_add_watch(inotify_.get(), path.empty() ? "." : path.c_str(), events | IN_ONLYDIR);
+  failure = watch < 0 ? errno : 0;
+  return watch;
+}
+
+void DirectoryWatcher::attach() {
+  // Fails for one whose directory is gone; the kernel has removed it then.
+  for (const int old : {directoryWatch_, parentWatch_}) {
+    if (old >= 0) inotify_rm_watch(inotify_.get(), old);
+  }
+  // The parent first, so that a directory which comes between the two is seen.
+  int parentFailure = 0;
+  int failure = 0;
+  parentWatch_ = watch(parent_, kEntryEvents | kSelfEvents, parentFailure);
+  directoryWatch_ = watch(directory_, kFileEvents | kSelfEvents, failure);
+  const bool isAwaited = parentWatch_ >= 0 && (failure == ENOENT || failure == ENOTDIR);
+  mustRetry_ = directoryWatch_ < 0 && !isAwaited;
+  if (!mustRetry_) retry_ = kFirstRetry;
+  noteProblem(mustRetry_ && failure != ENOENT ? failure : 0);
+}
+
+void DirectoryWatcher::noteProblem(int failure) {
+  if (std::exchange(problem_, failure) == failure || failure == 0) return;
+  errorLog(log_, "cannot watch %@: %@", directory_, std::generic_category().message(failure));
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,79 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <chrono>
+#include <functional>
+#include <string>
+#include <string_view>
+#include <thread>
+
+#include "platform/LogCategory.h"
+#include "platform/linux/FileDescriptor.h"
+
+namespace tonewerk {
+
+// Follows the files that are put into one directory, on a thread of its own.
+//
+//   closed after writing, renamed into place        -> onFile(name)
+//   linked into place: there and not empty          -> onFile(name)
+//   created, not yet closed                         -> nothing
+//   the kernel's event queue overflowed             -> onEverything()
+//   the directory came, or another took its place   -> onEverything()
+//
+// The kernel tells a link like a creation, so that a file which somebody has created and written to, but not
+// closed yet, may be told of early; it is told of again when it is closed.
+//
+// The directory is known by its path. It need not be there: its parent is watched for its coming. Where
+// neither is, or where watching fails, it is tried again at intervals that grow from a second to a minute.
+class DirectoryWatcher {
+ public:
+  using FileHandler = std::function<void(std::string_view name)>;
+
+  static constexpr std::chrono::milliseconds kFirstRetry{1'000};
+  static constexpr std::chrono::milliseconds kLastRetry{60'000};
+
+  // What comes after the constructor's return is told. The handlers are called on the watcher's thread, one
+  // at a time; meanwhile events gather in the kernel. `log` outlives the watcher.
+  DirectoryWatcher(std::string directory, FileHandler onFile, std::function<void()> onEverything,
+                   const LogCategory& log);
+  DirectoryWatcher(const DirectoryWatcher&) = delete;
+  DirectoryWatcher& operator=(const DirectoryWatcher&) = delete;
+  // No handler runs any more when it returns.
+  ~DirectoryWatcher();
+
+  // False where the system refuses to watch anything; then nothing is ever told.
+  bool isWorking() const { return static_cast<bool>(inotify_); }
+
+ private:
+  struct Event;
+
+  void run();
+  // Reads what the kernel has gathered.
+  void readEvents();
+  void handle(const Event& event);
+  // Watches what the paths lead to now, instead of what they led to before.
+  void attach();
+  int watch(const std::string& path, std::uint32_t events, int& failure);
+  void noteProblem(int failure);
+  std::chrono::milliseconds nextRetry();
+
+  const std::string directory_;
+  const std::string parent_;
+  const std::string name_;  // of the directory in its parent
+  const FileHandler onFile_;
+  const std::function<void()> onEverything_;
+  const LogCategory& log_;
+  const FileDescriptor stop_;  // becomes readable at the end
+  const FileDescriptor inotify_;
+
+  // The watcher's thread, after the constructor.
+  int directoryWatch_ = -1;
+  int parentWatch_ = -1;
+  bool mustRetry_ = false;
+  int problem_ = 0;  // the one last logged
+  std::chrono::milliseconds retry_ = kFirstRetry;
+
+  std::thread thread_;  // last: it uses all above
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,52 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstdint>
+#include <functional>
+#include <map>
+#include <mutex>
+#include <optional>
+#include <set>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "platform/NotificationHandlers.h"
+#include "platform/NotificationService.h"
+
+namespace tonewerk {
+
+// Named notifications that live as long as the test. Any thread.
+//
+//   notifications.post("com.orvane.x", 1);   // queues the handlers
+//   queues.runAll();                         // runs them
+//   notifications.makeUnreadable("com.orvane.x");
+//   notifications.failRegistrations(NotificationService::kStatusFailed);
+class MemoryNotificationService final : public NotificationService {
+ public:
+  Registration registerHandler(std::string_view name, SerialQueue& queue,
+                               std::function<void(Token)> handler) override;
+  std::optional<std::uint64_t> state(Token token) const override;
+  void cancel(Token token) override;
+  std::error_code post(std::string_view name) override;
+
+  // The same with a new state, as somebody else does it.
+  std::error_code post(std::string_view name, std::uint64_t state);
+  // Its state cannot be read until somebody posts one.
+  void makeUnreadable(std::string_view name);
+  // kStatusOk makes registrations succeed again.
+  void failRegistrations(std::uint32_t status);
+
+  // The names registered now, in the order of their registrations.
+  std::vector<std::string> registered() const;
+
+ private:
+  NotificationHandlers handlers_;
+  mutable std::mutex mutex_;  // guards all below
+  std::map<std::string, std::uint64_t, std::less<>> states_;
+  std::set<std::string, std::less<>> unreadable_;
+  std::map<Token, std::string> registered_;
+  std::uint32_t failure_ = kStatusOk;
+};
+
+}  // namespace tonewerk
