@@ -7,6 +7,8 @@ namespace tonewerk {
 
 class Chanmeter;
 class Clock;
+class CommandRunner;
+class DetachedThreads;
 class DeviceFacts;
 class Diagwire;
 class Energybook;
@@ -46,6 +48,8 @@ struct Platform {
   IssueDraftService& issueDrafts;
   WhirlcapRequest& whirlcaps;
   Chanmeter& chanmeter;
+  CommandRunner& commands;
+  DetachedThreads& threads;
   // Where reports for people go; absolute.
   std::string logsDirectory = {};
 };

@@ -6,6 +6,8 @@
 #include "support/ManualQueues.h"
 #include "support/ManualTimers.h"
 #include "support/MemoryChanmeter.h"
+#include "support/MemoryCommandRunner.h"
+#include "support/MemoryDetachedThreads.h"
 #include "support/MemoryDeviceFacts.h"
 #include "support/MemoryDiagwire.h"
 #include "support/MemoryEnergybook.h"
@@ -62,6 +64,8 @@ struct TestPlatform {
             .issueDrafts = issueDrafts,
             .whirlcaps = whirlcaps,
             .chanmeter = chanmeter,
+            .commands = commands,
+            .threads = threads,
             .logsDirectory = "/logs"};
   }
 
@@ -84,6 +88,8 @@ struct TestPlatform {
   MemoryIssueDraftService issueDrafts;
   MemoryWhirlcapRequest whirlcaps;
   MemoryChanmeter chanmeter;
+  MemoryCommandRunner commands;
+  MemoryDetachedThreads threads;
 };
 
 }  // namespace tonewerk

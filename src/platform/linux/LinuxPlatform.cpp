@@ -8,6 +8,8 @@
 #include "platform/linux/Directories.h"
 #include "platform/linux/InotifyNotificationService.h"
 #include "platform/linux/LinuxChanmeter.h"
+#include "platform/linux/LinuxCommandRunner.h"
+#include "platform/linux/LinuxDetachedThreads.h"
 #include "platform/linux/LinuxFileSystem.h"
 #include "platform/linux/LinuxIssueDraftService.h"
 #include "platform/linux/LinuxProcessInformation.h"
@@ -58,6 +60,8 @@ struct LinuxPlatform::Adapters {
   LinuxIssueDraftService issueDrafts{queues};
   LinuxWhirlcapRequest whirlcaps{category};
   LinuxChanmeter chanmeter;
+  LinuxCommandRunner commands;
+  LinuxDetachedThreads threads;
 };
 
 LinuxPlatform::LinuxPlatform(const Directories& directories)
@@ -93,6 +97,8 @@ Platform LinuxPlatform::platform(Metricon& metricon, Energybook& energybook, Dia
           .issueDrafts = a.issueDrafts,
           .whirlcaps = a.whirlcaps,
           .chanmeter = a.chanmeter,
+          .commands = a.commands,
+          .threads = a.threads,
           .logsDirectory = a.logsDirectory};
 }
 

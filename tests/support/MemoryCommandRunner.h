@@ -1,0 +1,49 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <condition_variable>
+#include <map>
+#include <mutex>
+#include <set>
+#include <string>
+#include <vector>
+
+#include "platform/CommandRunner.h"
+
+namespace tonewerk {
+
+// Commands that end as the test says. One that it says nothing of cannot be started. Any thread.
+//
+//   test.commands.answer("slabtop --once", "a line\n");
+//   test.commands.answer("tool", {"half a li", CommandRunner::End::kTooLong});
+//   test.commands.hold("tool");                  // its run() returns after release()
+class MemoryCommandRunner final : public CommandRunner {
+ public:
+  struct Run {
+    std::string command;
+    Limits limits;
+  };
+
+  Result run(const std::string& command, const Limits& limits) override;
+
+  void answer(const std::string& command, Result result);
+  void answer(const std::string& command, std::string output) {
+    answer(command, Result{std::move(output), End::kExited, 0});
+  }
+  void hold(const std::string& command);
+  void release(const std::string& command);
+
+  // In the order in which they began.
+  std::vector<Run> runs() const;
+  // Returns when that many have begun.
+  void awaitRuns(std::size_t count);
+
+ private:
+  mutable std::mutex mutex_;  // guards what follows
+  std::condition_variable changed_;
+  std::map<std::string, Result> answers_;
+  std::set<std::string> held_;
+  std::vector<Run> runs_;
+};
+
+}  // namespace tonewerk
