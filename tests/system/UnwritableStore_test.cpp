@@ -3,11 +3,10 @@
 // A store that cannot be written: the daemon serves on, says so once, and goes on writing when it can.
 #include <filesystem>
 #include <fstream>
-#include <sched.h>
 #include <sqlite3.h>
 #include <string>
-#include <sys/mount.h>
 
+#include "support/SmallFileSystem.h"
 #include "system/support/DaemonTest.h"
 #include "system/support/RecordedEvents.h"
 
@@ -90,30 +89,6 @@ TEST_F(UnwritableStoreTest, SomebodyElsesWriteLockIsWaitedFor) {
   EXPECT_TRUE(waitUntil([&] { return resumptions() == 1; }));
   EXPECT_EQ(failures(), 1U);
 }
-
-// A file system with little room that this process and its children alone see, so that nothing of it is left
-// whatever becomes of the test.
-class SmallFileSystem {
- public:
-  explicit SmallFileSystem(std::string path) : path_(std::move(path)) {
-    isMounted_ = ::unshare(CLONE_NEWNS) == 0 &&
-                 ::mount("none", "/", nullptr, MS_REC | MS_PRIVATE, nullptr) == 0 &&
-                 ::mount("tonewerk-test", path_.c_str(), "tmpfs", 0, "size=1m") == 0;
-  }
-  SmallFileSystem(const SmallFileSystem&) = delete;
-  SmallFileSystem& operator=(const SmallFileSystem&) = delete;
-  ~SmallFileSystem() {
-    if (isMounted_) ::umount2(path_.c_str(), MNT_DETACH);
-  }
-
-  bool isMounted() const { return isMounted_; }
-  // Makes room.
-  bool grow() { return ::mount("tonewerk-test", path_.c_str(), "tmpfs", MS_REMOUNT, "size=64m") == 0; }
-
- private:
-  const std::string path_;
-  bool isMounted_ = false;
-};
 
 TEST_F(UnwritableStoreTest, AFullDiskCostsNothingOnceThereIsRoomAgain) {
   SmallFileSystem disk(daemon.path(DaemonProcess::kState));
