@@ -1,0 +1,33 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <memory>
+
+#include "platform/Log.h"
+
+namespace tonewerk {
+
+class Clock;
+class RecentLines;
+
+// A log that keeps the last lines written to it besides, in the form of StreamLog, for those who ask what
+// went before.
+class RememberingLog final : public Log {
+ public:
+  // `clock` outlives the log.
+  RememberingLog(std::unique_ptr<Log> log, std::shared_ptr<RecentLines> lines, const Clock& clock);
+  ~RememberingLog() override;
+
+  bool isEnabled(std::string_view category, LogLevel level) const override {
+    return log_->isEnabled(category, level);
+  }
+  void write(std::string_view subsystem, std::string_view category, LogLevel level,
+             std::string_view message) override;
+
+ private:
+  const std::unique_ptr<Log> log_;
+  const std::shared_ptr<RecentLines> lines_;
+  const Clock& clock_;
+};
+
+}  // namespace tonewerk
