@@ -16,6 +16,7 @@
 #include "platform/LogLine.h"
 #include "platform/Platform.h"
 #include "platform/linux/CurlHttpClient.h"
+#include "platform/linux/DiagnosticsStore.h"
 #include "platform/linux/Directories.h"
 #include "platform/linux/LinuxLinkReport.h"
 #include "platform/linux/LinuxPlatform.h"
@@ -42,6 +43,8 @@ constexpr int kKilled = 2;
 constexpr std::chrono::seconds kFlushTimeout{10};
 // How long it waits for endpoints in the network.
 constexpr std::chrono::seconds kNetworkTimeout{5};
+// How long evidence is still collected for.
+constexpr std::chrono::seconds kDiagnosticsTimeout{3};
 
 constexpr std::string_view kHelp =
     "Usage: twreportingd [--help | --version]\n"
@@ -64,6 +67,7 @@ class Daemon {
         diagwire_(store_, linux.clock()),
         linkReport_(store_, linux.preferences(), linux.clock(), log, TONEWERK_VERSION,
                     [] { return std::make_unique<CurlHttpClient>("twreportingd/" TONEWERK_VERSION); }),
+        diagnostics_(linux.diagnostics()),
         context_(platformOf(linux, directories), allWorkerClasses()),
         service_(TWReportingService::make([this] { endOnKillRequest(); })),
         listener_(std::move(socket), log) {
@@ -98,6 +102,7 @@ class Daemon {
     context_.linkReportQueues().drain();
     linkReport_.finish(kNetworkTimeout);  // what is lost is in the exporters' own log lines
     store_.flush(kFlushTimeout);          // a failure is in the store's own log lines
+    diagnostics_.finish(kDiagnosticsTimeout);
   }
 
   ReportStore store_;
@@ -105,6 +110,7 @@ class Daemon {
   StoreEnergybook energybook_;
   StoreDiagwire diagwire_;
   LinuxLinkReport linkReport_;
+  DiagnosticsStore& diagnostics_;
   TWReportingContext context_;
   std::shared_ptr<TWReportingService> service_;
   UnixSocketListener listener_;

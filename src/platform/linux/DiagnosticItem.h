@@ -51,7 +51,7 @@ struct DiagnosticItem {
   // For request.json; "requestedAt", "collected" and "problems" are added to it.
   ValueMap request = {};
   // Makes one more file of what was collected; may be empty. Runs on the store's thread.
-  std::function<DiagnosticFile(const DiagnosticEvidence&)> describe = {};
+  std::function<DiagnosticFile(Date requestedAt, const DiagnosticEvidence&)> describe = {};
 };
 
 }  // namespace tonewerk

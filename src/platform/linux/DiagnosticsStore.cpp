@@ -81,7 +81,8 @@ std::error_code DiagnosticsStore::add(DiagnosticItem item, Completion completion
       if (isFirst) errorLog(log_, "too many diagnostics at once; requests are refused");
       return std::make_error_code(std::errc::no_buffer_space);
     }
-    refusedBefore = std::exchange(refused_, 0);
+    // Only once there is room again for more than one: under a flood each place is taken at once.
+    if (pending_.empty()) refusedBefore = std::exchange(refused_, 0);
     pendingBytes_ += bytes;
     pending_.push_back({std::move(item), now, std::move(completion)});
   }
@@ -145,7 +146,7 @@ std::error_code DiagnosticsStore::writeItem(const DiagnosticItem& item, const st
   DiagnosticEvidence evidence = runner_.run();
   std::vector<DiagnosticFile> files;
   files.push_back({kRequestFile, requestText(item, requestedAt, evidence)});
-  if (item.describe) files.push_back(item.describe(evidence));
+  if (item.describe) files.push_back(item.describe(Date{requestedAt}, evidence));
   for (DiagnosticFile& file : evidence.files) files.push_back(std::move(file));
   if (const std::error_code error = makeRoom(DiagnosticsDirectory::bytesOnDisk(files))) return error;
   return directory_.write(item.kind, name, files);

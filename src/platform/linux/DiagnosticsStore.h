@@ -111,7 +111,7 @@ class DiagnosticsStore {
   std::condition_variable changed_;
   std::deque<Pending> pending_;
   std::size_t pendingBytes_ = 0;
-  std::uint64_t refused_ = 0;  // since the last item that was taken
+  std::uint64_t refused_ = 0;  // since the queue was last empty
   bool isEnding_ = false;
   bool isIdle_ = false;
 

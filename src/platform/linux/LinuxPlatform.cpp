@@ -5,6 +5,7 @@
 #include <string>
 
 #include "platform/LogCategory.h"
+#include "platform/linux/DiagnosticsStore.h"
 #include "platform/linux/Directories.h"
 #include "platform/linux/InotifyNotificationService.h"
 #include "platform/linux/LinuxChanmeter.h"
@@ -16,6 +17,9 @@
 #include "platform/linux/LinuxSystemInformation.h"
 #include "platform/linux/LinuxWhirlcapRequest.h"
 #include "platform/linux/NlohmannJsonService.h"
+#include "platform/linux/RecentLines.h"
+#include "platform/linux/RememberingLog.h"
+#include "platform/linux/StandardCollectors.h"
 #include "platform/linux/StandardLog.h"
 #include "platform/linux/SystemClock.h"
 #include "platform/linux/ThreadQueueFactory.h"
@@ -41,11 +45,14 @@ struct LinuxPlatform::Adapters {
       : logsDirectory(absolutePath(directories.logs)),
         deviceFacts(directories.configuration + "/device-facts.toml", category),
         preferences(directories.configuration + "/preferences", directories.state + "/preferences", category),
-        notifications(directories.runtime + "/notifications", category) {}
+        notifications(directories.runtime + "/notifications", category),
+        diagnostics(directories.state, makeStandardCollectors(logLines), json, preferences, clock, category,
+                    {}) {}
 
   const std::string logsDirectory;
   SystemClock clock;
-  std::unique_ptr<Log> log = makeStandardLog(clock);
+  const std::shared_ptr<RecentLines> logLines = std::make_shared<RecentLines>();
+  std::unique_ptr<Log> log = std::make_unique<RememberingLog>(makeStandardLog(clock), logLines, clock);
   LogCategory category{*log, "com.orvane.tonewerk", "twrs"};  // the adapters' own lines
   UsdtTracePoints tracePoints;
   ThreadQueueFactory queues;
@@ -57,8 +64,9 @@ struct LinuxPlatform::Adapters {
   InotifyNotificationService notifications;
   LinuxFileSystem files;
   NlohmannJsonService json;
-  LinuxIssueDraftService issueDrafts{queues};
-  LinuxWhirlcapRequest whirlcaps{category};
+  DiagnosticsStore diagnostics;
+  LinuxIssueDraftService issueDrafts{diagnostics, queues};
+  LinuxWhirlcapRequest whirlcaps{diagnostics, category};
   LinuxChanmeter chanmeter;
   LinuxCommandRunner commands;
   LinuxDetachedThreads threads;
@@ -74,6 +82,7 @@ SerialQueueFactory& LinuxPlatform::queues() { return adapters_->queues; }
 TimerService& LinuxPlatform::timers() { return adapters_->timers; }
 PreferenceStore& LinuxPlatform::preferences() { return adapters_->preferences; }
 JsonService& LinuxPlatform::json() { return adapters_->json; }
+DiagnosticsStore& LinuxPlatform::diagnostics() { return adapters_->diagnostics; }
 
 Platform LinuxPlatform::platform(Metricon& metricon, Energybook& energybook, Diagwire& diagwire,
                                  LinkReport& linkReport) {

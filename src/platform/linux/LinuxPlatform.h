@@ -7,6 +7,7 @@
 
 namespace tonewerk {
 
+class DiagnosticsStore;
 struct Directories;
 
 // One of each adapter, and the Platform made of them. Whoever makes it lets it outlive what uses the
@@ -26,6 +27,8 @@ class LinuxPlatform {
   TimerService& timers();
   PreferenceStore& preferences();
   JsonService& json();
+  // Whoever ends the daemon finishes it before what uses the Platform is gone.
+  DiagnosticsStore& diagnostics();
 
   // The reporting services outlive what uses the result.
   Platform platform(Metricon& metricon, Energybook& energybook, Diagwire& diagwire, LinkReport& linkReport);

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/DiagnosticsStore.h"
 
+#include <atomic>
 #include <condition_variable>
 #include <filesystem>
 #include <fstream>
@@ -15,6 +16,7 @@
 #include "support/ManualClock.h"
 #include "support/MemoryLog.h"
 #include "support/MemoryPreferenceStore.h"
+#include "support/SmallFileSystem.h"
 #include "support/TemporaryDirectory.h"
 
 namespace tonewerk {
@@ -211,11 +213,11 @@ TEST_F(DiagnosticsStoreTest, AddsTheFileThatDescribesTheItem) {
   collectors = {std::make_shared<FixedCollector>("c.txt", DiagnosticCollector::Result{"whole", ""})};
   start();
   DiagnosticItem item{DiagnosticKind::kIssueDraft};
-  item.describe = [](const DiagnosticEvidence& evidence) {
-    return DiagnosticFile{"draft.md", "with " + evidence.files.at(0).name};
+  item.describe = [](Date requestedAt, const DiagnosticEvidence& evidence) {
+    return DiagnosticFile{"draft.md", textOf(requestedAt) + " with " + evidence.files.at(0).name};
   };
   const std::string name = addAndTake(std::move(item)).name;
-  EXPECT_EQ(items.readFile(DiagnosticKind::kIssueDraft, name, "draft.md"), "with c.txt");
+  EXPECT_EQ(items.readFile(DiagnosticKind::kIssueDraft, name, "draft.md"), "2025-11-20T10:18:00Z with c.txt");
 }
 
 TEST_F(DiagnosticsStoreTest, RefusesNamesThatAreNotPlain) {
@@ -290,6 +292,155 @@ TEST_F(DiagnosticsStoreTest, WritesWhatIsPendingAtTheEndWithoutEvidence) {
   EXPECT_EQ(request(DiagnosticKind::kCapture, "two").text("problems"),
             R"({"held.txt":"the daemon was ending"})");
   EXPECT_EQ(add({DiagnosticKind::kCapture, "three"}), std::errc::operation_canceled);
+}
+
+// Gives as many bytes as the test wants.
+class SizedCollector final : public DiagnosticCollector {
+ public:
+  explicit SizedCollector(std::size_t count) : bytes(count) {}
+  std::string_view fileName() const override { return "sized.txt"; }
+  Result collect() override { return {std::string(bytes, 'x'), ""}; }
+
+  std::atomic<std::size_t> bytes;
+};
+
+class DiagnosticsBoundsTest : public DiagnosticsStoreTest {
+ protected:
+  static constexpr std::size_t kKibibyte = 1024;
+
+  DiagnosticsBoundsTest() { collectors = {sized}; }
+
+  void set(std::string_view key, const Value& value) {
+    preferences.configure(DiagnosticsStore::kPreferenceDomain, key, value);
+  }
+  // So that the order is the test's, not the file system's clock's.
+  void setAge(DiagnosticKind kind, const std::string& name, int seconds) {
+    std::filesystem::last_write_time(items.pathOf(kind, name), std::filesystem::file_time_type::clock::now() -
+                                                                   std::chrono::seconds(seconds));
+  }
+  std::error_code write(DiagnosticKind kind, const std::string& name) {
+    return addAndTake({kind, name}).error;
+  }
+  std::uint64_t bytesOnDisk() {
+    std::uint64_t bytes = 0;
+    for (const auto& entry : items.listAll()) bytes += entry.bytes;
+    return bytes;
+  }
+
+  std::shared_ptr<SizedCollector> sized = std::make_shared<SizedCollector>(300 * kKibibyte);
+};
+
+TEST_F(DiagnosticsBoundsTest, TheOldestGoesWhateverItsKindWhenThereAreTooManyBytes) {
+  set("max_megabytes", 1);
+  start();
+  ASSERT_FALSE(write(DiagnosticKind::kCapture, "one"));
+  ASSERT_FALSE(write(DiagnosticKind::kWhirlcap, "two"));
+  ASSERT_FALSE(write(DiagnosticKind::kIssueDraft, "three"));
+  setAge(DiagnosticKind::kCapture, "one", 20);
+  setAge(DiagnosticKind::kWhirlcap, "two", 30);
+  ASSERT_EQ(items.listAll().size(), 3u);
+  ASSERT_FALSE(write(DiagnosticKind::kCapture, "four"));
+  EXPECT_THAT(names(DiagnosticKind::kCapture), ElementsAre("one", "four"));
+  EXPECT_THAT(names(DiagnosticKind::kWhirlcap), IsEmpty());
+  EXPECT_THAT(names(DiagnosticKind::kIssueDraft), ElementsAre("three"));
+  EXPECT_LE(bytesOnDisk(), 1024 * kKibibyte);
+}
+
+TEST_F(DiagnosticsBoundsTest, TheOldestGoesWhenThereAreTooManyItems) {
+  set("max_items", 2);
+  sized->bytes = 1;
+  start();
+  ASSERT_FALSE(write(DiagnosticKind::kWhirlcap, "one"));
+  setAge(DiagnosticKind::kWhirlcap, "one", 30);
+  ASSERT_FALSE(write(DiagnosticKind::kWhirlcap, "two"));
+  ASSERT_EQ(items.listAll().size(), 2u);
+  ASSERT_FALSE(write(DiagnosticKind::kWhirlcap, "three"));
+  EXPECT_THAT(names(DiagnosticKind::kWhirlcap), ElementsAre("two", "three"));
+}
+
+TEST_F(DiagnosticsBoundsTest, AnItemThatFillsTheBoundIsAllThatIsLeft) {
+  set("max_megabytes", 1);
+  start();
+  ASSERT_FALSE(write(DiagnosticKind::kWhirlcap, "one"));
+  sized->bytes = (1024 - 4 - 4) * kKibibyte;  // the folder and the request take a block each
+  ASSERT_FALSE(write(DiagnosticKind::kWhirlcap, "two"));
+  EXPECT_THAT(names(DiagnosticKind::kWhirlcap), ElementsAre("two"));
+  EXPECT_EQ(bytesOnDisk(), 1024 * kKibibyte);
+}
+
+TEST_F(DiagnosticsBoundsTest, AnItemLargerThanTheBoundIsRefusedAndCostsNoOther) {
+  set("max_megabytes", 1);
+  start();
+  ASSERT_FALSE(write(DiagnosticKind::kWhirlcap, "one"));
+  sized->bytes = (1024 - 4 - 4) * kKibibyte + 1;
+  EXPECT_EQ(write(DiagnosticKind::kWhirlcap, "two"), std::errc::file_too_large);
+  EXPECT_THAT(names(DiagnosticKind::kWhirlcap), ElementsAre("one"));
+  EXPECT_THAT(
+      lines.textsAt(LogLevel::kError),
+      ElementsAre("cannot write " + items.pathOf(DiagnosticKind::kWhirlcap, "two") + ": File too large"));
+}
+
+TEST_F(DiagnosticsBoundsTest, WithoutPreferencesTheBoundIsAQuarterOfAGigabyte) {
+  sized->bytes = 1;
+  start();
+  ASSERT_FALSE(write(DiagnosticKind::kWhirlcap, "one"));
+  // With what else the two items take, and without writing it.
+  const std::size_t rest = (256 * kKibibyte - 8 - 12) * kKibibyte;
+  const std::string large = items.pathOf(DiagnosticKind::kWhirlcap, "one") + "/sized.txt";
+  std::filesystem::resize_file(large, rest);
+  ASSERT_FALSE(write(DiagnosticKind::kWhirlcap, "two"));
+  EXPECT_THAT(names(DiagnosticKind::kWhirlcap), ElementsAre("one", "two"));
+  ASSERT_FALSE(items.remove(DiagnosticKind::kWhirlcap, "two"));
+  std::filesystem::resize_file(large, rest + 1);
+  ASSERT_FALSE(write(DiagnosticKind::kWhirlcap, "three"));
+  EXPECT_THAT(names(DiagnosticKind::kWhirlcap), ElementsAre("three"));
+}
+
+TEST_F(DiagnosticsBoundsTest, BoundsThatAreNoNumbersFromOneAreLeftOutAndNamedOnce) {
+  set("max_megabytes", "many");
+  set("max_items", 0);
+  start();
+  ASSERT_FALSE(write(DiagnosticKind::kWhirlcap, "one"));
+  ASSERT_FALSE(write(DiagnosticKind::kWhirlcap, "two"));
+  EXPECT_EQ(items.listAll().size(), 2u);
+  EXPECT_THAT(
+      lines.textsAt(LogLevel::kError),
+      ElementsAre("preferences of com.orvane.tonewerk.diagnostics that are no number from 1 are left out: "
+                  "max_megabytes = many max_items = 0"));
+}
+
+TEST_F(DiagnosticsBoundsTest, AFullDiskLeavesNoHalfItemsAndTheNextWorks) {
+  const SmallFileSystem disk(directory.path());  // of one megabyte
+  if (!disk.isMounted()) GTEST_SKIP() << "only root can make a file system";
+  start();
+  sized->bytes = 2048 * kKibibyte;
+  EXPECT_EQ(write(DiagnosticKind::kCapture, "large"), std::errc::no_space_on_device);
+  EXPECT_TRUE(std::filesystem::is_empty(directory.path("captures")));
+  EXPECT_THAT(lines.textsAt(LogLevel::kError),
+              ElementsAre("cannot write " + items.pathOf(DiagnosticKind::kCapture, "large") +
+                          ": No space left on device"));
+  sized->bytes = 500 * kKibibyte;
+  EXPECT_FALSE(write(DiagnosticKind::kCapture, "small"));
+  EXPECT_EQ(items.readFile(DiagnosticKind::kCapture, "small", "sized.txt")->size(), 500 * kKibibyte);
+}
+
+TEST_F(DiagnosticsBoundsTest, ADirectoryThatCannotBeMadeIsAnErrorUntilItCan) {
+  const std::string inTheWay = directory.path("captures");
+  std::ofstream(inTheWay) << "not a directory";
+  start();
+  EXPECT_TRUE(write(DiagnosticKind::kCapture, "one"));
+  EXPECT_THAT(lines.textsAt(LogLevel::kError), SizeIs(1));
+  std::filesystem::remove(inTheWay);
+  EXPECT_FALSE(write(DiagnosticKind::kCapture, "two"));
+}
+
+TEST_F(DiagnosticsBoundsTest, RemovesWhatACrashLeftBeforeTheFirstItem) {
+  std::filesystem::create_directories(directory.path("captures/.one.new"));
+  std::ofstream(directory.path("captures/.one.new/request.json")) << "{";
+  start();
+  EXPECT_FALSE(write(DiagnosticKind::kWhirlcap, "two"));
+  EXPECT_TRUE(std::filesystem::is_empty(directory.path("captures")));
+  EXPECT_THAT(lines.textsAt(LogLevel::kError), ElementsAre("removed diagnostics that were not complete: 1"));
 }
 
 }  // namespace
