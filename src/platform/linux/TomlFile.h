@@ -3,10 +3,10 @@
 
 #include <optional>
 #include <string>
-#include <sys/stat.h>
 #include <system_error>
 
 #include "platform/LogCategory.h"
+#include "platform/linux/FileStamp.h"
 #include "values/Value.h"
 
 namespace tonewerk {
@@ -27,24 +27,12 @@ class TomlFile {
   const std::string& path() const { return path_; }
 
  private:
-  // Which file this is, in which state.
-  struct Stamp {
-    dev_t device;
-    ino_t inode;
-    off_t size;
-    std::int64_t modifiedNanoseconds;
-    std::int64_t changedNanoseconds;
-    friend bool operator==(const Stamp&, const Stamp&) = default;
-  };
-  static Stamp stampOf(const struct stat& status);
-  static bool isSettled(const Stamp& stamp);
-
   void read();
   void fail(const std::string& problem);
 
   const std::string path_;
   const LogCategory& log_;
-  std::optional<Stamp> stamp_;  // of what was read; none when it cannot be trusted to tell a later state
+  std::optional<FileStamp> stamp_;  // of what was read; none when it cannot be trusted to tell a later state
   ValueMap values_;
   std::string problem_;
 };
