@@ -47,7 +47,8 @@ struct LinuxPlatform::Adapters {
         preferences(directories.configuration + "/preferences", directories.state + "/preferences", category),
         notifications(directories.runtime + "/notifications", category),
         diagnostics(directories.state, makeStandardCollectors(logLines), json, preferences, clock, category,
-                    {}) {}
+                    {}),
+        chanmeter(directories.runtime + "/channels", category) {}
 
   const std::string logsDirectory;
   SystemClock clock;
