@@ -69,7 +69,7 @@ class CommandLineTest : public testing::Test {
 
 TEST_F(CommandLineTest, HelpsWithEveryCommand) {
   for (const char* name :
-       {"list", "validate", "send", "replay", "events", "metrics", "power", "rtc", "defaults", "kill"}) {
+       {"list", "validate", "send", "replay", "events", "metrics", "power", "rtc", "defaults", "captures", "drafts", "whirlcaps", "kill"}) {
     EXPECT_EQ(run({name, "--help"}), kDone);
     EXPECT_THAT(output(), HasSubstr("--json")) << name;
     EXPECT_THAT(errors(), IsEmpty());

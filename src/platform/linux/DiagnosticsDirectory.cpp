@@ -113,6 +113,12 @@ std::string DiagnosticsDirectory::pathOf(DiagnosticKind kind, std::string_view n
   return directoryOf(kind) + "/" + std::string(name);
 }
 
+std::error_code DiagnosticsDirectory::checkReadable(DiagnosticKind kind) const {
+  std::error_code error;
+  const fs::directory_iterator opened(directoryOf(kind), error);
+  return error == std::errc::no_such_file_or_directory ? std::error_code() : error;
+}
+
 std::vector<DiagnosticsDirectory::Entry> DiagnosticsDirectory::list(DiagnosticKind kind) const {
   std::vector<Entry> entries;
   for (std::string& name : namesIn(directoryOf(kind))) {

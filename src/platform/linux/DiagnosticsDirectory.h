@@ -48,7 +48,10 @@ class DiagnosticsDirectory {
 
   std::string pathOf(DiagnosticKind kind, std::string_view name) const;
 
-  // Oldest first; a directory that is missing has none.
+  // Why items cannot be listed; no error where there are none.
+  [[nodiscard]] std::error_code checkReadable(DiagnosticKind kind) const;
+
+  // Oldest first; a directory that is missing or cannot be read has none.
   std::vector<Entry> list(DiagnosticKind kind) const;
   // Those of all kinds, oldest first.
   std::vector<Entry> listAll() const;
