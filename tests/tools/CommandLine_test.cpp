@@ -259,7 +259,7 @@ TEST_F(CommandLineTest, PlaysARecordingThatEndsTheDaemon) {
 
 TEST_F(CommandLineTest, PlaysTheExamples) {
   daemon();
-  for (const char* name : {"music-session.jsonl", "no-session.jsonl"}) {
+  for (const char* name : {"music-session.jsonl", "no-session.jsonl", "diagnostics.jsonl"}) {
     const std::string file = std::string(TONEWERK_SOURCE_DIR) + "/examples/" + name;
     EXPECT_EQ(run({"replay", file, "--speed", "max"}), kDone) << errors();
   }
