@@ -7,6 +7,7 @@
 #include "platform/DeviceFacts.h"
 #include "platform/LogLine.h"
 #include "session/TWReportingUtility.h"
+#include "session/WorkQueueGate.h"
 
 namespace tonewerk {
 namespace {
@@ -41,7 +42,7 @@ TWReportingContext::TWReportingContext(const Platform& platform,
 }
 
 TWReportingContext::~TWReportingContext() {
-  reportingServerQueue_.reset();
+  endReportingServerQueue();
   endLinkReportQueues();
   fileSinkQueue_.reset();
   currentContext = nullptr;
@@ -57,8 +58,19 @@ SerialQueue& TWReportingContext::reportingServerQueue() {
   std::call_once(reportingServerQueueOnce_, [this] {
     reportingServerQueue_ = platform_.queues.makeSerialQueue("com.orvane.tonewerk.reporting.server",
                                                              QueuePriority::kUserInteractive);
+    reportingServerQueueGate_ = std::make_shared<WorkQueueGate>(*reportingServerQueue_);
   });
   return *reportingServerQueue_;
+}
+
+std::shared_ptr<WorkQueueGate> TWReportingContext::reportingServerQueueGate() {
+  reportingServerQueue();
+  return reportingServerQueueGate_;
+}
+
+void TWReportingContext::endReportingServerQueue() {
+  if (reportingServerQueueGate_ != nullptr) reportingServerQueueGate_->close();
+  reportingServerQueue_.reset();
 }
 
 SinkQueue& TWReportingContext::fileSinkQueue() {

@@ -20,6 +20,8 @@
 
 namespace tonewerk {
 
+class WorkQueueGate;
+
 // Everything of which there is one in the process: the platform's services, the work queue, the log
 // categories, the worker registry, the lookup tables, the internal-build answer. The entry point makes one
 // and each test makes one afresh; the free functions that take no argument find it through current().
@@ -42,6 +44,9 @@ class TWReportingContext {
 
   // The one serial queue that carries every request body, session and worker call. Made on first use.
   SerialQueue& reportingServerQueue();
+
+  // The way onto it for what may come when it is gone. Closes before the queue ends.
+  std::shared_ptr<WorkQueueGate> reportingServerQueueGate();
 
   // Where sinks that write files do so, so that the work queue does not wait for a disk. Made on first use.
   SinkQueue& fileSinkQueue();
@@ -99,6 +104,7 @@ class TWReportingContext {
   std::once_flag workerRegistryOnce_;
   std::optional<TWReportingSessionWorkerRegistry> workerRegistry_;
 
+  void endReportingServerQueue();
   void endLinkReportQueues();
 
   // Last, so that they end first: their work may use anything above. The work queue feeds the sinks'.
@@ -108,6 +114,7 @@ class TWReportingContext {
   std::unique_ptr<PrivateQueues> linkReportQueues_;
   std::once_flag reportingServerQueueOnce_;
   std::unique_ptr<SerialQueue> reportingServerQueue_;
+  std::shared_ptr<WorkQueueGate> reportingServerQueueGate_;  // made with the queue
 };
 
 }  // namespace tonewerk

@@ -1,0 +1,27 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "session/WorkQueueGate.h"
+
+#include <utility>
+
+namespace tonewerk {
+
+bool WorkQueueGate::run(Task work) {
+  {
+    const std::lock_guard lock(mutex_);
+    if (queue_ == nullptr) return false;
+    if (!queue_->isCurrent()) {
+      queue_->async(std::move(work));
+      return true;
+    }
+  }
+  // Without the lock: the work may come here again. The queue does not end while its own work runs.
+  work();
+  return true;
+}
+
+void WorkQueueGate::close() {
+  const std::lock_guard lock(mutex_);
+  queue_ = nullptr;
+}
+
+}  // namespace tonewerk
