@@ -44,8 +44,8 @@ struct FaultsignSignature {
 // The diagnostic-capture service, as one symptom's reporter talks to it. On the thread that made it.
 class FaultsignReporter {
  public:
-  // The reply map, none when the service had nothing to say. On a thread of the service's, at most once,
-  // perhaps after the reporter is gone, perhaps before the call that it answers has returned.
+  // The reply map, none when the service had nothing to say. At most once, on any thread: perhaps one of the
+  // service's when the reporter is gone, perhaps the caller's before the call that it answers has returned.
   using Reply = std::function<void(const std::optional<ValueMap>&)>;
 
   virtual ~FaultsignReporter() = default;
@@ -55,8 +55,8 @@ class FaultsignReporter {
                                                  std::optional<std::string> detectedProcess,
                                                  std::optional<ValueMap> triggerThresholdValues) = 0;
 
-  // Captures now; `duration` in seconds. True when the parameters were accepted, and only then a reply may
-  // come.
+  // Captures now; `duration` in seconds. True when the parameters were accepted. The reply says whether a
+  // capture was made of it; for parameters that were not accepted it may say why not.
   virtual bool snapshotWithSignature(const FaultsignSignature& signature, double duration,
                                      const std::optional<ValueMap>& event,
                                      const std::optional<ValueMap>& payload, Reply reply) = 0;

@@ -5,6 +5,7 @@
 
 namespace tonewerk {
 
+class Capsa;
 class Chanmeter;
 class Clock;
 class CommandRunner;
@@ -45,6 +46,7 @@ struct Platform {
   Energybook& energybook;
   Diagwire& diagwire;
   LinkReport& linkReport;
+  Capsa& capsa;
   IssueDraftService& issueDrafts;
   WhirlcapRequest& whirlcaps;
   Chanmeter& chanmeter;

@@ -34,6 +34,7 @@ inline constexpr AudioEventType kTypeUnknown = 65535;
 using AudioServiceType = std::uint16_t;
 
 inline constexpr AudioServiceType kServiceGeneric = 0;
+inline constexpr AudioServiceType kServiceAlarms = 4;
 inline constexpr AudioServiceType kServiceStandalone = 5;
 inline constexpr AudioServiceType kServiceTest = 11;
 inline constexpr AudioServiceType kServiceApiUsage = 12;

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "workers/TWReportingWorkerClasses.h"
 
+#include "workers/diagnostics/TWReportingSessionCapsaWorker.h"
 #include "workers/producers/TWReportingSessionGatherMessagesWorker.h"
 #include "workers/producers/TWReportingSessionInputMessagesWorker.h"
 #include "workers/producers/TWReportingSessionVolumeMessagesWorker.h"
@@ -24,6 +25,7 @@ std::vector<const TWReportingSessionWorkerClass*> allWorkerClasses() {
       &TWReportingSessionMetriconWorker::kWorkerClass,
       &TWReportingSessionEnergybookWorker::kWorkerClass,
       &TWReportingSessionDiagwireWorker::kWorkerClass,
+      &TWReportingSessionCapsaWorker::kWorkerClass,
       &TWReportingSessionSummaryJsonFileWorker::kWorkerClass,
       &TWReportingSessionRtcWorker::kWorkerClass,
   };

@@ -488,8 +488,8 @@ TEST_F(WorkerTest, TheDaemonsClassesComeInTheRegistrysOrder) {
               ElementsAre("TWReportingSessionVolumeMessagesWorker", "TWReportingSessionGatherMessagesWorker",
                           "TWReportingSessionSummaryWorker", "TWReportingSessionInputMessagesWorker",
                           "TWReportingSessionMetriconWorker", "TWReportingSessionEnergybookWorker",
-                          "TWReportingSessionDiagwireWorker", "TWReportingSessionSummaryJsonFileWorker",
-                          "TWReportingSessionRtcWorker"));
+                          "TWReportingSessionDiagwireWorker", "TWReportingSessionCapsaWorker",
+                          "TWReportingSessionSummaryJsonFileWorker", "TWReportingSessionRtcWorker"));
 }
 
 TEST_F(WorkerTest, TheRegistryIsFilledOnce) {

@@ -5,6 +5,7 @@
 #include "support/ManualClock.h"
 #include "support/ManualQueues.h"
 #include "support/ManualTimers.h"
+#include "support/MemoryCapsa.h"
 #include "support/MemoryChanmeter.h"
 #include "support/MemoryCommandRunner.h"
 #include "support/MemoryDetachedThreads.h"
@@ -61,6 +62,7 @@ struct TestPlatform {
             .energybook = energybook,
             .diagwire = diagwire,
             .linkReport = otherLinkReport,
+            .capsa = capsa,
             .issueDrafts = issueDrafts,
             .whirlcaps = whirlcaps,
             .chanmeter = chanmeter,
@@ -85,6 +87,7 @@ struct TestPlatform {
   MemoryEnergybook energybook;
   MemoryDiagwire diagwire;
   MemoryLinkReport linkReport;
+  MemoryCapsa capsa;
   MemoryIssueDraftService issueDrafts;
   MemoryWhirlcapRequest whirlcaps;
   MemoryChanmeter chanmeter;

@@ -8,6 +8,7 @@
 #include "platform/linux/DiagnosticsStore.h"
 #include "platform/linux/Directories.h"
 #include "platform/linux/InotifyNotificationService.h"
+#include "platform/linux/LinuxCapsa.h"
 #include "platform/linux/LinuxChanmeter.h"
 #include "platform/linux/LinuxCommandRunner.h"
 #include "platform/linux/LinuxDetachedThreads.h"
@@ -68,6 +69,7 @@ struct LinuxPlatform::Adapters {
   DiagnosticsStore diagnostics;
   LinuxIssueDraftService issueDrafts{diagnostics, queues};
   LinuxWhirlcapRequest whirlcaps{diagnostics, category};
+  LinuxCapsa capsa;
   LinuxChanmeter chanmeter;
   LinuxCommandRunner commands;
   LinuxDetachedThreads threads;
@@ -104,6 +106,7 @@ Platform LinuxPlatform::platform(Metricon& metricon, Energybook& energybook, Dia
           .energybook = energybook,
           .diagwire = diagwire,
           .linkReport = linkReport,
+          .capsa = a.capsa,
           .issueDrafts = a.issueDrafts,
           .whirlcaps = a.whirlcaps,
           .chanmeter = a.chanmeter,

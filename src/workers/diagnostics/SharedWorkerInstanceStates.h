@@ -1,0 +1,18 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <map>
+#include <memory>
+#include <string>
+
+#include "workers/diagnostics/WorkerInstanceState.h"
+
+namespace tonewerk {
+
+// The states that the instances of all sessions share, by the name of their class. The process has one; the
+// first capture worker makes it. On the work queue.
+struct SharedWorkerInstanceStates {
+  std::map<std::string, std::shared_ptr<WorkerInstanceState>, std::less<>> byClassName;
+};
+
+}  // namespace tonewerk

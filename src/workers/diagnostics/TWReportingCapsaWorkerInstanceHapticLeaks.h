@@ -1,0 +1,31 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <memory>
+
+#include "workers/diagnostics/TWReportingSessionCapsaWorkerInstance.h"
+
+namespace tonewerk {
+
+// Haptics hardware that somebody keeps active: captures at once when messages keep saying so for more than a
+// minute. All sessions of the process count together.
+class TWReportingCapsaWorkerInstanceHapticLeaks final : public TWReportingSessionCapsaWorkerInstance {
+ public:
+  static const TWReportingSessionCapsaWorkerInstanceClass kInstanceClass;
+  const TWReportingSessionCapsaWorkerInstanceClass& instanceClass() const override { return kInstanceClass; }
+
+  static std::unique_ptr<TWReportingSessionCapsaWorkerInstance> initWithSession(
+      const std::shared_ptr<TWReportingSession>& session);
+  explicit TWReportingCapsaWorkerInstanceHapticLeaks(const std::shared_ptr<TWReportingSession>& session);
+
+  WorkerInstanceState& workerState() override { return *state_; }
+  bool interestedInMessage(const TWReportingSessionMessage& message) override;
+  bool canFire() const override { return true; }
+  void fire(const TWReportingSessionMessage& message) override;
+
+ private:
+  const std::weak_ptr<TWReportingSession> session_;
+  const std::shared_ptr<WorkerInstanceState> state_;
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,33 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "workers/diagnostics/TWReportingSessionCapsaWorkerInstance.h"
+
+#include <utility>
+
+#include "session/TWReportingContext.h"
+#include "session/TWReportingUtility.h"
+#include "session/WorkQueueGate.h"
+#include "workers/diagnostics/TWReportingSessionCapsaWorker.h"
+#include "workers/diagnostics/WorkerInstanceState.h"
+
+namespace tonewerk {
+
+LogSite TWReportingSessionCapsaWorkerInstance::logSite(int line) {
+  return {TWReportingCapsaLogCategory(), "TWReportingSessionCapsaWorker", line};
+}
+
+// The state is everybody's on the work queue, so the answer goes there rather than behind a lock. It holds
+// the state weakly: an answer that never comes must not keep it.
+FaultsignReporter::Reply TWReportingSessionCapsaWorkerInstance::replyHandler(
+    const std::shared_ptr<WorkerInstanceState>& state, LogReply log) {
+  return [gate = TWReportingContext::current().reportingServerQueueGate(), weak = std::weak_ptr(state),
+          log = std::move(log)](const std::optional<ValueMap>& response) {
+    gate->run([weak, log, response] {
+      const std::string identifier =
+          TWReportingSessionCapsaWorker::getSessionIdentifierFromResponse(response);
+      if (const auto alive = weak.lock()) alive->currentCapsaSessionIdentifier = identifier;
+      log(identifier, response);
+    });
+  };
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,113 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "support/MemoryCapsa.h"
+
+#include <mutex>
+#include <utility>
+
+namespace tonewerk {
+
+struct MemoryCapsa::State {
+  mutable std::mutex mutex;  // guards all below
+  std::vector<Request> requests;
+  std::vector<std::string> cancelled;
+  std::size_t reporterCount = 0;
+  bool accepts = true;
+  bool answersAtOnce = false;
+  ReplyMap reply;
+};
+
+class MemoryCapsa::MemoryReporter final : public FaultsignReporter {
+ public:
+  explicit MemoryReporter(std::shared_ptr<State> state) : state_(std::move(state)) {}
+
+  FaultsignSignature signatureWithDomain(std::string domain, std::string type, std::string subType,
+                                         std::string subtypeContext,
+                                         std::optional<std::string> detectedProcess,
+                                         std::optional<ValueMap> triggerThresholdValues) override {
+    return {std::move(domain),          std::move(type),
+            std::move(subType),         std::move(subtypeContext),
+            std::move(detectedProcess), std::move(triggerThresholdValues)};
+  }
+
+  bool snapshotWithSignature(const FaultsignSignature& signature, double duration,
+                             const std::optional<ValueMap>& event, const std::optional<ValueMap>& payload,
+                             Reply reply) override {
+    return take({true, signature, duration, event, payload, std::nullopt, std::move(reply)});
+  }
+
+  bool startSessionWithSignature(const FaultsignSignature& signature, double duration,
+                                 const std::optional<ValueMap>& events,
+                                 const std::optional<ValueMap>& payload,
+                                 const std::optional<ValueMap>& actions, Reply reply) override {
+    return take({false, signature, duration, events, payload, actions, std::move(reply)});
+  }
+
+  void cancelSession(const std::string& identifier) override {
+    const std::lock_guard lock(state_->mutex);
+    state_->cancelled.push_back(identifier);
+  }
+
+ private:
+  bool take(const Request& request) {
+    ReplyMap reply;
+    {
+      const std::lock_guard lock(state_->mutex);
+      state_->requests.push_back(request);
+      if (!state_->accepts) return false;
+      if (!state_->answersAtOnce) return true;
+      reply = state_->reply;
+    }
+    request.reply(reply);
+    return true;
+  }
+
+  const std::shared_ptr<State> state_;
+};
+
+MemoryCapsa::MemoryCapsa() : state_(std::make_shared<State>()) {}
+MemoryCapsa::~MemoryCapsa() = default;
+
+std::unique_ptr<FaultsignReporter> MemoryCapsa::makeReporter() {
+  const std::lock_guard lock(state_->mutex);
+  ++state_->reporterCount;
+  return std::make_unique<MemoryReporter>(state_);
+}
+
+void MemoryCapsa::refuse() {
+  const std::lock_guard lock(state_->mutex);
+  state_->accepts = false;
+}
+
+void MemoryCapsa::answerAtOnce(ReplyMap reply) {
+  const std::lock_guard lock(state_->mutex);
+  state_->answersAtOnce = true;
+  state_->reply = std::move(reply);
+}
+
+void MemoryCapsa::answer(std::size_t at, const ReplyMap& reply) { requests().at(at).reply(reply); }
+
+MemoryCapsa::ReplyMap MemoryCapsa::started(const std::string& sessionIdentifier) {
+  return ValueMap{{kFaultsignReplySuccess, true}, {kFaultsignReplySessionID, sessionIdentifier}};
+}
+
+MemoryCapsa::ReplyMap MemoryCapsa::failed(FaultsignError reason) {
+  return ValueMap{{kFaultsignReplySuccess, false},
+                  {kFaultsignReplyReason, static_cast<std::int64_t>(reason)}};
+}
+
+std::vector<MemoryCapsa::Request> MemoryCapsa::requests() const {
+  const std::lock_guard lock(state_->mutex);
+  return state_->requests;
+}
+
+std::vector<std::string> MemoryCapsa::cancelled() const {
+  const std::lock_guard lock(state_->mutex);
+  return state_->cancelled;
+}
+
+std::size_t MemoryCapsa::reporterCount() const {
+  const std::lock_guard lock(state_->mutex);
+  return state_->reporterCount;
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,227 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "workers/diagnostics/TWReportingCapsaWorkerInstanceAlarmLowRMS.h"
+
+#include <gtest/gtest.h>
+#include <thread>
+
+#include "workers/diagnostics/CapsaTest.h"
+
+namespace tonewerk {
+namespace {
+
+using ::testing::Contains;
+using ::testing::ElementsAre;
+using ::testing::HasSubstr;
+using ::testing::IsEmpty;
+using ::testing::SizeIs;
+
+class TWReportingCapsaWorkerInstanceAlarmLowRMSTest : public CapsaTest {
+ protected:
+  void SetUp() override { begin(makeSessionOf(kServiceAlarms)); }
+
+  void begin(std::shared_ptr<TWReportingSession> newSession) {
+    session = std::move(newSession);
+    worker = TWReportingSessionCapsaWorker::initWithSession(session);
+    worker->start();
+  }
+  // A quiet alarm, once more; no two alike.
+  void report(const Value& issue = "LowRMS", AudioEventCategory category = kCategoryError,
+              AudioEventType type = kTypeIssueDetector) {
+    handle(*worker, {{"issue_type", issue}, {"n", ++reported}}, category, type);
+  }
+  // Makes it fire.
+  void stayQuiet() {
+    report();
+    test.clock.advance(16.0);
+    report();
+    report();
+  }
+  WorkerInstanceState& state() { return *stateOf(*worker, "TWReportingCapsaWorkerInstanceAlarmLowRMS"); }
+
+  int reported = 0;
+  std::shared_ptr<TWReportingSession> session;
+  std::shared_ptr<TWReportingSessionCapsaWorker> worker;
+};
+
+TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, BeginsWithItsThresholds) {
+  EXPECT_EQ(state().interestThresholdCount, 3);
+  EXPECT_EQ(state().interestThresholdDurationSeconds, 15.0);
+  EXPECT_TRUE(state().oncePerSession);
+}
+
+TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, IsNotForSessionsOfSingleMessages) {
+  session->setSingleMessageSession(true);
+  EXPECT_EQ(TWReportingCapsaWorkerInstanceAlarmLowRMS::initWithSession(session), nullptr);
+  EXPECT_FALSE(TWReportingCapsaWorkerInstanceAlarmLowRMS::kInstanceClass.handleSingleMessageSession);
+}
+
+TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, WantsLowRmsIssuesAmongErrorsOnly) {
+  report();
+  EXPECT_EQ(state().interestedCount, 1);
+  report("lowrms");
+  report(1);
+  report("LowRMS", kCategoryGeneric);
+  report("LowRMS", 0x20000000 | kCategoryError);
+  report("LowRMS", kCategoryError, kTypeError);
+  handle(*worker, {{"n", 1}}, kCategoryError, kTypeIssueDetector);
+  EXPECT_EQ(state().interestedCount, 1);
+}
+
+TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, WatchesAlarmsAndTheTestServiceOnly) {
+  for (AudioServiceType service = 0; service <= 14; ++service) {
+    begin(makeSessionOf(service));
+    report();
+    EXPECT_EQ(state().interestedCount, service == 4 || service == 11 ? 1 : 0) << service;
+  }
+}
+
+TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest,
+       FiresAtTheEarliestOnItsThirdMessageMoreThanFifteenSecondsAfterTheFirst) {
+  report();
+  report();
+  test.clock.advance(15.0);
+  report();
+  EXPECT_THAT(test.capsa.requests(), IsEmpty());  // three, but not longer
+  test.clock.advance(0.5);
+  report();
+  EXPECT_THAT(test.capsa.requests(), SizeIs(1));
+}
+
+TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, TwoMessagesDoNotFireHoweverLongItLasts) {
+  report();
+  test.clock.advance(600.0);
+  report();
+  EXPECT_THAT(test.capsa.requests(), IsEmpty());
+  report();
+  EXPECT_THAT(test.capsa.requests(), SizeIs(1));
+}
+
+TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, NeverFiresASecondTimeInTheSameSession) {
+  stayQuiet();
+  stayQuiet();
+  stayQuiet();
+  worker->stop();
+  worker->start();
+  stayQuiet();
+  EXPECT_THAT(test.capsa.requests(), SizeIs(1));
+  EXPECT_EQ(state().firedCount, 1);
+  begin(makeSessionOf(kServiceAlarms));
+  stayQuiet();
+  EXPECT_THAT(test.capsa.requests(), SizeIs(2));
+}
+
+TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, AsksForACaptureAMinuteLater) {
+  stayQuiet();
+  ASSERT_THAT(test.capsa.requests(), SizeIs(1));
+  const MemoryCapsa::Request request = test.capsa.requests().front();
+  EXPECT_FALSE(request.isImmediate);
+  EXPECT_EQ(request.duration, 60.0);
+  EXPECT_EQ(request.events, std::nullopt);
+  EXPECT_EQ(request.payload, std::nullopt);
+  EXPECT_EQ(request.actions, std::nullopt);
+  EXPECT_EQ(request.signature.type, "alarms");
+  EXPECT_EQ(request.signature.subType, "Error");
+  EXPECT_EQ(request.signature.subtypeContext, "IssueDetector");
+  EXPECT_THAT(infos(), ElementsAre("Parameters to Capsa session for alarm Low RMS accepted. Will fire if not "
+                                   "cancelled. timeout=60.000000."));
+}
+
+TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, ParametersThatAreNotAcceptedAreAnErrorLine) {
+  test.capsa.refuse();
+  stayQuiet();
+  EXPECT_THAT(errors(), ElementsAre("Capsa session for alarm Low RMS failed to start."));
+  EXPECT_THAT(infos(), IsEmpty());
+  worker->stop();
+  EXPECT_THAT(test.capsa.cancelled(), IsEmpty());
+}
+
+TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, AnAnswerIsKeptAndLogged) {
+  stayQuiet();
+  test.log.clear();
+  std::thread([&] { test.capsa.answer(0, MemoryCapsa::started("S1")); }).join();
+  test.queues.runAll();
+  EXPECT_EQ(state().currentCapsaSessionIdentifier, "S1");
+  EXPECT_THAT(infos(),
+              ElementsAre("Started Capsa session. sessionId=S1",
+                          "Started Capsa session for alarm Low RMS. sessionId=S1 timeout=60.000000 "
+                          R"(response={"kFaultsignReplySuccess":true,"kFaultsignReplySessionID":"S1"})"));
+}
+
+TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, StoppingCancelsThePendingCapture) {
+  stayQuiet();
+  test.capsa.answer(0, MemoryCapsa::started("S1"));
+  test.queues.runAll();
+  test.log.clear();
+  worker->stop();
+  EXPECT_THAT(test.capsa.cancelled(), ElementsAre("S1"));
+  EXPECT_THAT(infos(), ElementsAre("Stop called. Cancelling Capsa session for alarm Low RMS. sessionId=S1 "
+                                   "timeout=60.000000"));
+  EXPECT_THAT(test.log.linesOf("twrb").front().message, HasSubstr("TWReportingSessionCapsaWorker:"));
+}
+
+TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, StoppingAfterAFailedStartCancelsNoneReturned) {
+  stayQuiet();
+  test.capsa.answer(0, MemoryCapsa::failed(kFaultsignErrorDailyLimitExceeded));
+  test.queues.runAll();
+  worker->stop();
+  EXPECT_THAT(test.capsa.cancelled(), ElementsAre("NONE_RETURNED"));
+}
+
+TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, StoppingWithoutAnAnswerCancelsNothing) {
+  stayQuiet();
+  test.log.clear();
+  worker->stop();
+  EXPECT_THAT(test.capsa.cancelled(), IsEmpty());
+  EXPECT_THAT(test.log.linesOf("twrb"), IsEmpty());
+}
+
+TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, StoppingWithoutAFireCancelsNothing) {
+  report();
+  worker->stop();
+  EXPECT_THAT(test.capsa.cancelled(), IsEmpty());
+}
+
+TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, AnAnswerAfterTheStopIsLoggedAndCancelsNothing) {
+  stayQuiet();
+  worker->stop();
+  worker.reset();
+  session.reset();
+  test.log.clear();
+  std::thread([&] { test.capsa.answer(0, MemoryCapsa::started("S1")); }).join();
+  test.queues.runAll();
+  EXPECT_THAT(infos(), Contains(HasSubstr("Started Capsa session for alarm Low RMS. sessionId=S1")));
+  EXPECT_THAT(test.capsa.cancelled(), IsEmpty());
+}
+
+TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, AStopBehindAnAnswerOnTheWorkQueueFindsTheIdentifier) {
+  test.capsa.answerAtOnce(MemoryCapsa::started("S1"));
+  context->reportingServerQueue().async([&] {
+    stayQuiet();
+    worker->stop();
+  });
+  test.queues.runAll();
+  EXPECT_THAT(test.capsa.cancelled(), ElementsAre("S1"));
+}
+
+TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, InATestSessionTheFireIsSkippedAndNothingIsCancelled) {
+  begin(makeSessionOf(kServiceTest));
+  stayQuiet();
+  EXPECT_THAT(infos(), ElementsAre("Skipping actual fire, as we are running in test mode."));
+  EXPECT_THAT(test.capsa.requests(), IsEmpty());
+  EXPECT_EQ(state().firedCount, 1);
+  worker->stop();
+  EXPECT_THAT(test.capsa.cancelled(), IsEmpty());
+}
+
+TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, SessionsCountForThemselves) {
+  report();
+  test.clock.advance(16.0);
+  report();
+  begin(makeSessionOf(kServiceAlarms));
+  report();
+  EXPECT_EQ(state().interestedCount, 1);
+  EXPECT_THAT(test.capsa.requests(), IsEmpty());
+}
+
+}  // namespace
+}  // namespace tonewerk
