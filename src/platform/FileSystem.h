@@ -33,6 +33,18 @@ class FileSystem {
   // `directory` (a name with a slash or a zero byte, ".", "..", a symbolic link that stands there).
   virtual std::unique_ptr<WritableFile> createFile(const std::string& directory, const std::string& name,
                                                    std::error_code& error) = 0;
+
+  // Whether something stands there; a symbolic link counts as what it leads to.
+  virtual bool exists(const std::string& path) const = 0;
+
+  // A regular file's whole text, of at most 16 MiB (else std::errc::file_too_large).
+  [[nodiscard]] virtual std::error_code readFile(const std::string& path, std::string& text) const = 0;
+
+  // Moves a regular file to `name` in `directory`, also onto another file system, where it is copied. Fails,
+  // and leaves everything as it was, when something stands there (std::errc::file_exists) or when the file
+  // would not lie directly in `directory` (as createFile()).
+  [[nodiscard]] virtual std::error_code moveFile(const std::string& from, const std::string& directory,
+                                                 const std::string& name) = 0;
 };
 
 }  // namespace tonewerk

@@ -86,6 +86,41 @@ std::unique_ptr<WritableFile> MemoryFileSystem::createFile(const std::string& di
   return std::make_unique<File>(state_, path);
 }
 
+bool MemoryFileSystem::exists(const std::string& path) const {
+  const std::lock_guard lock(state_->mutex);
+  return state_->files.contains(path) || state_->directories.contains(path) || state_->links.contains(path);
+}
+
+std::error_code MemoryFileSystem::readFile(const std::string& path, std::string& text) const {
+  const std::lock_guard lock(state_->mutex);
+  if (state_->readFailure != std::errc()) return std::make_error_code(state_->readFailure);
+  if (state_->directories.contains(path)) return std::make_error_code(std::errc::is_a_directory);
+  const auto found = state_->files.find(path);
+  if (found == state_->files.end()) return std::make_error_code(std::errc::no_such_file_or_directory);
+  text = found->second;
+  return {};
+}
+
+std::error_code MemoryFileSystem::moveFile(const std::string& from, const std::string& directory,
+                                           const std::string& name) {
+  const std::lock_guard lock(state_->mutex);
+  if (state_->moveFailure != std::errc()) return std::make_error_code(state_->moveFailure);
+  if (!isPlainName(name)) return std::make_error_code(std::errc::invalid_argument);
+  if (state_->directories.contains(from) || state_->links.contains(from)) {
+    return std::make_error_code(std::errc::operation_not_permitted);
+  }
+  const std::string to = directory + "/" + name;
+  const bool hasPlace = state_->files.contains(from) && state_->directories.contains(directory);
+  if (!hasPlace) return std::make_error_code(std::errc::no_such_file_or_directory);
+  if (state_->files.contains(to) || state_->directories.contains(to) || state_->links.contains(to)) {
+    return std::make_error_code(std::errc::file_exists);
+  }
+  auto node = state_->files.extract(from);
+  node.key() = to;
+  state_->files.insert(std::move(node));
+  return {};
+}
+
 void MemoryFileSystem::failCreateDirectories(std::errc error) {
   const std::lock_guard lock(state_->mutex);
   state_->createDirectoriesFailure = error;
@@ -105,6 +140,22 @@ void MemoryFileSystem::failWrite(int nth, std::errc error) {
 void MemoryFileSystem::failClose(std::errc error) {
   const std::lock_guard lock(state_->mutex);
   state_->closeFailure = error;
+}
+
+void MemoryFileSystem::failReadFile(std::errc error) {
+  const std::lock_guard lock(state_->mutex);
+  state_->readFailure = error;
+}
+
+void MemoryFileSystem::failMoveFile(std::errc error) {
+  const std::lock_guard lock(state_->mutex);
+  state_->moveFailure = error;
+}
+
+void MemoryFileSystem::addFile(const std::string& path, std::string text) {
+  static_cast<void>(createDirectories(path.substr(0, path.rfind('/')), 0755));
+  const std::lock_guard lock(state_->mutex);
+  state_->files[path] = std::move(text);
 }
 
 void MemoryFileSystem::addSymbolicLink(const std::string& path) {

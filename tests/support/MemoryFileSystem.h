@@ -28,6 +28,10 @@ class MemoryFileSystem final : public FileSystem {
   std::error_code createDirectories(const std::string& path, unsigned mode) override;
   std::unique_ptr<WritableFile> createFile(const std::string& directory, const std::string& name,
                                            std::error_code& error) override;
+  bool exists(const std::string& path) const override;
+  std::error_code readFile(const std::string& path, std::string& text) const override;
+  std::error_code moveFile(const std::string& from, const std::string& directory,
+                           const std::string& name) override;
 
   // std::errc() makes the call succeed again.
   void failCreateDirectories(std::errc error);
@@ -35,6 +39,10 @@ class MemoryFileSystem final : public FileSystem {
   // The `nth` write() from now on fails, 1 the next one; every other succeeds.
   void failWrite(int nth, std::errc error);
   void failClose(std::errc error);
+  void failReadFile(std::errc error);
+  void failMoveFile(std::errc error);
+  // A file with this text, its directories included.
+  void addFile(const std::string& path, std::string text);
   // createFile() fails where one stands.
   void addSymbolicLink(const std::string& path);
 
@@ -57,6 +65,8 @@ class MemoryFileSystem final : public FileSystem {
     std::errc writeFailure{};
     int writesUntilFailure = 0;  // 0 for none
     std::errc closeFailure{};
+    std::errc readFailure{};
+    std::errc moveFailure{};
     int openFiles = 0;
   };
   class File;

@@ -4,6 +4,9 @@
 #include <cassert>
 #include <cerrno>
 #include <fcntl.h>
+#include <linux/fs.h>
+#include <stdio.h>
+#include <sys/sendfile.h>
 #include <sys/stat.h>
 #include <unistd.h>
 #include <utility>
@@ -76,6 +79,37 @@ std::error_code makeEmpty(int descriptor) {
   return ftruncate(descriptor, 0) == 0 ? std::error_code() : lastSystemError();
 }
 
+std::error_code copyAll(int from, int to) {
+  constexpr std::size_t kPieceBytes = std::size_t{16} << 20;
+  for (;;) {
+    const ssize_t copied = sendfile(to, from, nullptr, kPieceBytes);
+    if (copied == 0) return {};
+    if (copied < 0 && errno != EINTR) return lastSystemError();
+  }
+}
+
+// Copies the file `from` to a new one, and leaves none when that fails.
+std::error_code copyFile(const std::string& from, int directory, const std::string& name) {
+  const FileDescriptor source(open(from.c_str(), O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
+  if (!source) return lastSystemError();
+  const int descriptor =
+      openat(directory, name.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, kFileMode);
+  if (descriptor < 0) return lastSystemError();
+  LinuxFile copy(descriptor);
+  std::error_code error = copyAll(source.get(), descriptor);
+  if (!error) error = copy.close();
+  if (error) static_cast<void>(unlinkat(directory, name.c_str(), 0));
+  return error;
+}
+
+std::error_code copyAndRemove(const std::string& from, int directory, const std::string& name) {
+  if (const std::error_code error = copyFile(from, directory, name)) return error;
+  if (unlink(from.c_str()) == 0) return {};
+  const std::error_code error = lastSystemError();
+  static_cast<void>(unlinkat(directory, name.c_str(), 0));
+  return error;
+}
+
 }  // namespace
 
 std::error_code LinuxFileSystem::createDirectories(const std::string& path, unsigned mode) {
@@ -113,6 +147,31 @@ std::unique_ptr<WritableFile> LinuxFileSystem::createFile(const std::string& dir
   error = makeEmpty(descriptor);
   if (error) return nullptr;
   return file;
+}
+
+bool LinuxFileSystem::exists(const std::string& path) const {
+  struct stat status {};
+  return path.find('\0') == std::string::npos && stat(path.c_str(), &status) == 0;
+}
+
+std::error_code LinuxFileSystem::readFile(const std::string& path, std::string& text) const {
+  if (path.find('\0') != std::string::npos) return std::make_error_code(std::errc::invalid_argument);
+  return readTextFile(path, text);
+}
+
+std::error_code LinuxFileSystem::moveFile(const std::string& from, const std::string& directory,
+                                          const std::string& name) {
+  if (!isPlainName(name)) return std::make_error_code(std::errc::invalid_argument);
+  struct stat status {};
+  if (lstat(from.c_str(), &status) != 0) return lastSystemError();
+  if (!S_ISREG(status.st_mode)) return std::make_error_code(std::errc::operation_not_permitted);
+  const FileDescriptor parent(open(directory.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
+  if (!parent) return lastSystemError();
+  if (renameat2(AT_FDCWD, from.c_str(), parent.get(), name.c_str(), RENAME_NOREPLACE) == 0) return {};
+  const std::error_code error = lastSystemError();
+  // The second is a file system that cannot rename without replacing.
+  const bool needsCopy = error == std::errc::cross_device_link || error == std::errc::invalid_argument;
+  return needsCopy ? copyAndRemove(from, parent.get(), name) : error;
 }
 
 }  // namespace tonewerk

@@ -14,6 +14,11 @@ class LinuxFileSystem final : public FileSystem {
   // The file is readable by everybody whom the directory lets in, writable by its owner (0644).
   std::unique_ptr<WritableFile> createFile(const std::string& directory, const std::string& name,
                                            std::error_code& error) override;
+  bool exists(const std::string& path) const override;
+  std::error_code readFile(const std::string& path, std::string& text) const override;
+  // A copy is there to be seen while it grows; one that fails is removed.
+  std::error_code moveFile(const std::string& from, const std::string& directory,
+                           const std::string& name) override;
 };
 
 }  // namespace tonewerk

@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 #include <sstream>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include "platform/linux/LinuxFileSystem.h"
 #include "support/MemoryFileSystem.h"
@@ -125,6 +126,100 @@ TYPED_TEST(FileSystemContract, AFileInTheWayOfADirectoryIsAnError) {
   EXPECT_EQ(this->kind_.files.createDirectories(this->path("d/file"), 0755), std::errc::not_a_directory);
   EXPECT_EQ(this->kind_.files.createDirectories(this->path("d/file/below"), 0755),
             std::errc::not_a_directory);
+}
+
+TYPED_TEST(FileSystemContract, KnowsWhatStandsWhere) {
+  EXPECT_TRUE(this->kind_.files.exists(this->path("d")));
+  EXPECT_FALSE(this->kind_.files.exists(this->path("d/file")));
+  EXPECT_FALSE(this->create("file")->close());
+  EXPECT_TRUE(this->kind_.files.exists(this->path("d/file")));
+  EXPECT_FALSE(this->kind_.files.exists(""));
+}
+
+TYPED_TEST(FileSystemContract, ReadsAWholeFile) {
+  {
+    const auto file = this->create("file");
+    EXPECT_FALSE(file->write(std::string("one\0two", 7)));
+  }
+  std::string text;
+  EXPECT_FALSE(this->kind_.files.readFile(this->path("d/file"), text));
+  EXPECT_EQ(text, std::string("one\0two", 7));
+  EXPECT_EQ(this->kind_.files.readFile(this->path("d/none"), text), std::errc::no_such_file_or_directory);
+  EXPECT_TRUE(this->kind_.files.readFile(this->path("d"), text));
+}
+
+TYPED_TEST(FileSystemContract, MovesAFileToAnotherDirectory) {
+  EXPECT_FALSE(this->kind_.files.createDirectories(this->path("e"), 0755));
+  EXPECT_FALSE(this->create("file")->write("text"));
+  EXPECT_FALSE(this->kind_.files.moveFile(this->path("d/file"), this->path("e"), "new"));
+  EXPECT_FALSE(this->kind_.files.exists(this->path("d/file")));
+  EXPECT_EQ(this->kind_.contents(this->path("e/new")), "text");
+}
+
+TYPED_TEST(FileSystemContract, AMoveReplacesNothing) {
+  EXPECT_FALSE(this->create("from")->write("new"));
+  EXPECT_FALSE(this->create("to")->write("old"));
+  EXPECT_EQ(this->kind_.files.moveFile(this->path("d/from"), this->path("d"), "to"), std::errc::file_exists);
+  EXPECT_EQ(this->kind_.contents(this->path("d/from")), "new");
+  EXPECT_EQ(this->kind_.contents(this->path("d/to")), "old");
+}
+
+TYPED_TEST(FileSystemContract, AMoveDoesNotLeaveItsDirectory) {
+  EXPECT_FALSE(this->create("from")->write("new"));
+  for (const char* name : {"", ".", "..", "../x", "a/b"}) {
+    EXPECT_EQ(this->kind_.files.moveFile(this->path("d/from"), this->path("d"), name),
+              std::errc::invalid_argument);
+  }
+}
+
+TYPED_TEST(FileSystemContract, AMoveNeedsItsFileAndItsDirectory) {
+  EXPECT_EQ(this->kind_.files.moveFile(this->path("d/none"), this->path("d"), "to"),
+            std::errc::no_such_file_or_directory);
+  EXPECT_FALSE(this->create("from")->write("new"));
+  EXPECT_EQ(this->kind_.files.moveFile(this->path("d/from"), this->path("none"), "to"),
+            std::errc::no_such_file_or_directory);
+  EXPECT_EQ(this->kind_.contents(this->path("d/from")), "new");
+}
+
+TYPED_TEST(FileSystemContract, OnlyAFileIsMoved) {
+  this->kind_.addSymbolicLink(this->path("d/link"));
+  EXPECT_FALSE(this->kind_.files.createDirectories(this->path("d/inner"), 0755));
+  for (const char* name : {"d/link", "d/inner"}) {
+    EXPECT_EQ(this->kind_.files.moveFile(this->path(name), this->path("d"), "to"),
+              std::errc::operation_not_permitted);
+  }
+}
+
+TEST(LinuxFileSystemTest, MovesAcrossFileSystems) {
+  const TemporaryDirectory directory;
+  const std::string from = "/dev/shm/tonewerk-move-" + std::to_string(getpid());
+  std::ofstream(from) << "text";
+  struct stat source {};
+  struct stat target {};
+  ASSERT_EQ(stat(from.c_str(), &source), 0);
+  ASSERT_EQ(stat(directory.path().c_str(), &target), 0);
+  if (source.st_dev == target.st_dev) {
+    std::filesystem::remove(from);
+    GTEST_SKIP() << "only one file system here";
+  }
+  LinuxFileSystem files;
+  std::ofstream(directory.path("old")) << "old";
+  EXPECT_EQ(files.moveFile(from, directory.path(), "old"), std::errc::file_exists);
+  EXPECT_EQ(OnDisk::contents(directory.path("old")), "old");
+  EXPECT_EQ(OnDisk::contents(from), "text");
+
+  EXPECT_FALSE(files.moveFile(from, directory.path(), "new"));
+  EXPECT_EQ(OnDisk::contents(directory.path("new")), "text");
+  EXPECT_FALSE(std::filesystem::exists(from));
+}
+
+TEST(LinuxFileSystemTest, AMoveToWhereNoFileCanBeMadeLeavesTheFile) {
+  const TemporaryDirectory directory;
+  std::ofstream(directory.path("from")) << "text";
+  LinuxFileSystem files;
+  // No regular file can be made there, whoever asks.
+  EXPECT_TRUE(files.moveFile(directory.path("from"), "/proc/self", "to"));
+  EXPECT_EQ(OnDisk::contents(directory.path("from")), "text");
 }
 
 TEST(LinuxFileSystemTest, APipeInTheFilesPlaceNeitherBlocksNorIsWritten) {
