@@ -5,6 +5,7 @@
 
 namespace tonewerk {
 
+class Benchfile;
 class Capsa;
 class Chanmeter;
 class Clock;
@@ -16,12 +17,15 @@ class Energybook;
 class FileSystem;
 class IssueDraftService;
 class JsonService;
+class Kolvi;
 class LinkReport;
 class Log;
 class Metricon;
 class NotificationService;
 class PreferenceStore;
 class ProcessInformation;
+class Runtrace;
+class SemaphoreFactory;
 class SerialQueueFactory;
 class SystemInformation;
 class TimerService;
@@ -35,6 +39,7 @@ struct Platform {
   Clock& clock;
   SerialQueueFactory& queues;
   TimerService& timers;
+  SemaphoreFactory& semaphores;
   ProcessInformation& processes;
   SystemInformation& system;
   DeviceFacts& deviceFacts;
@@ -47,6 +52,9 @@ struct Platform {
   Diagwire& diagwire;
   LinkReport& linkReport;
   Capsa& capsa;
+  Runtrace& runtrace;
+  Kolvi& kolvi;
+  Benchfile& benchfile;
   IssueDraftService& issueDrafts;
   WhirlcapRequest& whirlcaps;
   Chanmeter& chanmeter;
@@ -54,6 +62,8 @@ struct Platform {
   DetachedThreads& threads;
   // Where reports for people go; absolute.
   std::string logsDirectory = {};
+  // Where files go that are soon moved; absolute.
+  std::string temporaryDirectory = {};
 };
 
 }  // namespace tonewerk

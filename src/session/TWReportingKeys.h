@@ -20,6 +20,11 @@ inline constexpr std::string_view TWReportingInternalEventProcessUptimeMS = "pro
 inline constexpr std::string_view TWReportingInternalEventSystemUptimeSec = "systemuptime_sec";
 inline constexpr std::string_view TWReportingQMApplicationName = "QMHostApplicationDisplayID";
 
+// Of a test session's configuration: what is traced, and where the benchmark data file goes.
+inline constexpr std::string_view TWReportingKolviPlistFilePath = "TWReportingKolviPlistFilePath";
+inline constexpr std::string_view TWReportingKolviOutputFileName = "TWReportingKolviOutputFileName";
+inline constexpr std::string_view TWReportingKolviOutputFileDirectory = "TWReportingKolviOutputFileDirectory";
+
 inline constexpr std::string_view TWReportingMessageKeySessionOutputRunning = "session_output_running";
 inline constexpr std::string_view TWReportingMessageKeySessionInputRunning = "session_input_running";
 inline constexpr std::string_view TWReportingMessageKeySessionDuration = "session_duration";

@@ -2,6 +2,7 @@
 #include "workers/TWReportingWorkerClasses.h"
 
 #include "workers/diagnostics/TWReportingSessionCapsaWorker.h"
+#include "workers/diagnostics/TWReportingSessionTraceWorker.h"
 #include "workers/producers/TWReportingSessionGatherMessagesWorker.h"
 #include "workers/producers/TWReportingSessionInputMessagesWorker.h"
 #include "workers/producers/TWReportingSessionVolumeMessagesWorker.h"
@@ -18,6 +19,7 @@ namespace tonewerk {
 // The orientation producer is left out on purpose: it cannot be made.
 std::vector<const TWReportingSessionWorkerClass*> allWorkerClasses() {
   return {
+      &TWReportingSessionTraceWorker::kWorkerClass,
       &TWReportingSessionVolumeMessagesWorker::kWorkerClass,
       &TWReportingSessionGatherMessagesWorker::kWorkerClass,
       &TWReportingSessionSummaryWorker::kWorkerClass,

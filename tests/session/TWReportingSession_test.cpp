@@ -485,11 +485,12 @@ TEST_F(WorkerTest, AClassWhoseInstancesCannotBeMadeIsLeftOut) {
 
 TEST_F(WorkerTest, TheDaemonsClassesComeInTheRegistrysOrder) {
   EXPECT_THAT(namesOf(allWorkerClasses()),
-              ElementsAre("TWReportingSessionVolumeMessagesWorker", "TWReportingSessionGatherMessagesWorker",
-                          "TWReportingSessionSummaryWorker", "TWReportingSessionInputMessagesWorker",
-                          "TWReportingSessionMetriconWorker", "TWReportingSessionEnergybookWorker",
-                          "TWReportingSessionDiagwireWorker", "TWReportingSessionCapsaWorker",
-                          "TWReportingSessionSummaryJsonFileWorker", "TWReportingSessionRtcWorker"));
+              ElementsAre("TWReportingSessionTraceWorker", "TWReportingSessionVolumeMessagesWorker",
+                          "TWReportingSessionGatherMessagesWorker", "TWReportingSessionSummaryWorker",
+                          "TWReportingSessionInputMessagesWorker", "TWReportingSessionMetriconWorker",
+                          "TWReportingSessionEnergybookWorker", "TWReportingSessionDiagwireWorker",
+                          "TWReportingSessionCapsaWorker", "TWReportingSessionSummaryJsonFileWorker",
+                          "TWReportingSessionRtcWorker"));
 }
 
 TEST_F(WorkerTest, TheRegistryIsFilledOnce) {

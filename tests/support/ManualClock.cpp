@@ -30,14 +30,21 @@ std::chrono::minutes ManualClock::utcOffset(double) const {
 }
 
 void ManualClock::advance(std::chrono::nanoseconds duration) {
+  advanceUntil(duration, [] { return false; });
+}
+
+bool ManualClock::advanceUntil(std::chrono::nanoseconds duration, const std::function<bool()>& isDone) {
   assert(duration.count() >= 0);
   const std::chrono::nanoseconds end = monotonic() + duration;
+  if (isDone()) return true;
   while (Alarm* alarm = earliestUntil(end)) {
     // An alarm may itself have moved the clock past the next one's time.
     moveTo(std::max(monotonic(), *alarm->nextDue()));
     alarm->runNext();
+    if (isDone()) return true;
   }
   moveTo(std::max(monotonic(), end));
+  return false;
 }
 
 void ManualClock::advance(double seconds) {

@@ -3,6 +3,7 @@
 
 #include <chrono>
 #include <cstdint>
+#include <functional>
 #include <mutex>
 #include <optional>
 #include <vector>
@@ -41,6 +42,9 @@ class ManualClock final : public Clock {
   // Moves both times forward. What is due on the way runs in order, each at its own time.
   void advance(std::chrono::nanoseconds duration);
   void advance(double seconds);
+  // As advance(duration), but no further than to where `isDone` says so, which is asked at the beginning and
+  // after everything that was due. True when it did.
+  bool advanceUntil(std::chrono::nanoseconds duration, const std::function<bool()>& isDone);
   void setNow(double seconds);
   void setUtcOffset(std::chrono::minutes offset);
 

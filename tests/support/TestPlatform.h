@@ -4,7 +4,9 @@
 #include "platform/Platform.h"
 #include "support/ManualClock.h"
 #include "support/ManualQueues.h"
+#include "support/ManualSemaphores.h"
 #include "support/ManualTimers.h"
+#include "support/MemoryBenchfile.h"
 #include "support/MemoryCapsa.h"
 #include "support/MemoryChanmeter.h"
 #include "support/MemoryCommandRunner.h"
@@ -15,12 +17,14 @@
 #include "support/MemoryFileSystem.h"
 #include "support/MemoryIssueDraftService.h"
 #include "support/MemoryJsonService.h"
+#include "support/MemoryKolvi.h"
 #include "support/MemoryLinkReport.h"
 #include "support/MemoryLog.h"
 #include "support/MemoryMetricon.h"
 #include "support/MemoryNotificationService.h"
 #include "support/MemoryPreferenceStore.h"
 #include "support/MemoryProcessInformation.h"
+#include "support/MemoryRuntrace.h"
 #include "support/MemorySystemInformation.h"
 #include "support/MemoryTracePoints.h"
 #include "support/MemoryWhirlcapRequest.h"
@@ -51,6 +55,7 @@ struct TestPlatform {
             .clock = otherClock,
             .queues = otherQueues,
             .timers = timers,
+            .semaphores = semaphores,
             .processes = processes,
             .system = system,
             .deviceFacts = deviceFacts,
@@ -63,12 +68,16 @@ struct TestPlatform {
             .diagwire = diagwire,
             .linkReport = otherLinkReport,
             .capsa = capsa,
+            .runtrace = runtrace,
+            .kolvi = kolvi,
+            .benchfile = benchfile,
             .issueDrafts = issueDrafts,
             .whirlcaps = whirlcaps,
             .chanmeter = chanmeter,
             .commands = commands,
             .threads = threads,
-            .logsDirectory = "/logs"};
+            .logsDirectory = "/logs",
+            .temporaryDirectory = "/tmp"};
   }
 
   MemoryLog log;
@@ -76,6 +85,7 @@ struct TestPlatform {
   ManualClock clock;
   ManualQueues queues;
   ManualTimers timers{clock};
+  ManualSemaphores semaphores{clock};
   MemoryProcessInformation processes;
   MemorySystemInformation system;
   MemoryDeviceFacts deviceFacts;
@@ -88,6 +98,9 @@ struct TestPlatform {
   MemoryDiagwire diagwire;
   MemoryLinkReport linkReport;
   MemoryCapsa capsa;
+  MemoryRuntrace runtrace{clock};
+  MemoryKolvi kolvi;
+  MemoryBenchfile benchfile{files};
   MemoryIssueDraftService issueDrafts;
   MemoryWhirlcapRequest whirlcaps;
   MemoryChanmeter chanmeter;

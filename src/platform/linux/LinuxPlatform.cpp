@@ -8,6 +8,7 @@
 #include "platform/linux/DiagnosticsStore.h"
 #include "platform/linux/Directories.h"
 #include "platform/linux/InotifyNotificationService.h"
+#include "platform/linux/JsonBenchfile.h"
 #include "platform/linux/LinuxCapsa.h"
 #include "platform/linux/LinuxChanmeter.h"
 #include "platform/linux/LinuxCommandRunner.h"
@@ -24,9 +25,11 @@
 #include "platform/linux/StandardLog.h"
 #include "platform/linux/SystemClock.h"
 #include "platform/linux/ThreadQueueFactory.h"
+#include "platform/linux/ThreadSemaphores.h"
 #include "platform/linux/TimerThread.h"
 #include "platform/linux/TomlDeviceFacts.h"
 #include "platform/linux/TomlPreferenceStore.h"
+#include "platform/linux/UnavailableTracing.h"
 #include "platform/linux/UsdtTracePoints.h"
 
 namespace tonewerk {
@@ -38,6 +41,14 @@ std::string absolutePath(const std::string& path) {
   const std::filesystem::path absolute = std::filesystem::absolute(path, error);
   return error ? path : absolute.string();
 }
+
+std::string temporaryDirectory() {
+  std::error_code error;
+  const std::filesystem::path path = std::filesystem::temp_directory_path(error);
+  return error ? "/tmp" : path.string();
+}
+
+constexpr char kNoTracing[] = "performance tracing is not built in";
 
 }  // namespace
 
@@ -59,6 +70,7 @@ struct LinuxPlatform::Adapters {
   UsdtTracePoints tracePoints;
   ThreadQueueFactory queues;
   TimerThread timers;
+  ThreadSemaphores semaphores;
   LinuxProcessInformation processes;
   LinuxSystemInformation system{clock};
   TomlDeviceFacts deviceFacts;
@@ -73,6 +85,9 @@ struct LinuxPlatform::Adapters {
   LinuxChanmeter chanmeter;
   LinuxCommandRunner commands;
   LinuxDetachedThreads threads;
+  JsonBenchfile benchfile{clock};
+  UnavailableRuntrace runtrace{kNoTracing};
+  UnavailableKolvi kolvi{kNoTracing};
 };
 
 LinuxPlatform::LinuxPlatform(const Directories& directories)
@@ -95,6 +110,7 @@ Platform LinuxPlatform::platform(Metricon& metricon, Energybook& energybook, Dia
           .clock = a.clock,
           .queues = a.queues,
           .timers = a.timers,
+          .semaphores = a.semaphores,
           .processes = a.processes,
           .system = a.system,
           .deviceFacts = a.deviceFacts,
@@ -107,12 +123,16 @@ Platform LinuxPlatform::platform(Metricon& metricon, Energybook& energybook, Dia
           .diagwire = diagwire,
           .linkReport = linkReport,
           .capsa = a.capsa,
+          .runtrace = a.runtrace,
+          .kolvi = a.kolvi,
+          .benchfile = a.benchfile,
           .issueDrafts = a.issueDrafts,
           .whirlcaps = a.whirlcaps,
           .chanmeter = a.chanmeter,
           .commands = a.commands,
           .threads = a.threads,
-          .logsDirectory = a.logsDirectory};
+          .logsDirectory = a.logsDirectory,
+          .temporaryDirectory = temporaryDirectory()};
 }
 
 }  // namespace tonewerk

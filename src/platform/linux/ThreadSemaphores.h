@@ -1,0 +1,14 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include "platform/Semaphore.h"
+
+namespace tonewerk {
+
+// Semaphores for threads that sleep. Waits follow the monotonic clock.
+class ThreadSemaphores final : public SemaphoreFactory {
+ public:
+  std::unique_ptr<Semaphore> makeSemaphore() override;
+};
+
+}  // namespace tonewerk

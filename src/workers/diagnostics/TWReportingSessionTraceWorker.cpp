@@ -1,0 +1,62 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "workers/diagnostics/TWReportingSessionTraceWorker.h"
+
+#include "platform/FileSystem.h"
+#include "platform/LogLine.h"
+#include "session/TWReportingContext.h"
+#include "session/TWReportingKeys.h"
+#include "session/TWReportingSession.h"
+#include "session/TWReportingUtility.h"
+#include "workers/diagnostics/TraceBenchfile.h"
+#include "workers/diagnostics/TraceRun.h"
+
+namespace tonewerk {
+
+const TWReportingSessionWorkerClass TWReportingSessionTraceWorker::kWorkerClass =
+    workerClassOf<TWReportingSessionTraceWorker>("TWReportingSessionTraceWorker");
+
+TWReportingSessionTraceWorker::TWReportingSessionTraceWorker(
+    const std::shared_ptr<TWReportingSession>& owner) {
+  session = owner;
+}
+
+TWReportingSessionTraceWorker::~TWReportingSessionTraceWorker() {
+  if (run_ != nullptr) run_->abandon();
+}
+
+std::string TWReportingSessionTraceWorker::TWReportingTracingLogsDirectory() {
+  return TWReportingContext::current().platform().logsDirectory + "/Audio/Traces";
+}
+
+bool TWReportingSessionTraceWorker::traces(const TWReportingSession& session) {
+  return session.serviceType() == kServiceTest && TWReportingUtilityIsInternalBuild();
+}
+
+std::optional<bool> TWReportingSessionTraceWorker::start() {
+  const auto owner = session.lock();
+  if (startedTracing_ || owner == nullptr || !traces(*owner)) return started;
+  const ValueMap configuration = owner->configuration();
+  const Value* probeList = configuration.find(TWReportingKolviPlistFilePath);
+  const std::string path = probeList == nullptr ? "" : probeList->text();
+  if (!TWReportingContext::current().platform().files.exists(path)) {
+    errorLog(TWReportingTraceCategory(),
+             "Could not start Runtrace. TWReportingKolviPlistFilePath: %@ is not a valid path", probeList);
+    return started;
+  }
+  if (run_ != nullptr) run_->abandon();
+  run_ = TraceRun::make(path);
+  startedTracing_ = true;
+  run_->requestStart();
+  if (!run_->waitForStart()) return false;
+  started = true;
+  return started;
+}
+
+void TWReportingSessionTraceWorker::stop() {
+  const auto owner = session.lock();
+  if (owner == nullptr || !startedTracing_ || !traces(*owner)) return;
+  startedTracing_ = false;
+  if (run_->stop()) TraceBenchfile(*owner).processTraceKolvi(run_->finalTraceURL());
+}
+
+}  // namespace tonewerk

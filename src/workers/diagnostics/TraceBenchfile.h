@@ -1,0 +1,46 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <memory>
+#include <optional>
+#include <string>
+
+#include "values/Value.h"
+
+namespace tonewerk {
+
+class BenchfileWriter;
+class KolviModel;
+class TWReportingSession;
+struct KolviProbe;
+
+// Makes a benchmark data file of a finished trace, for one session. On the work queue. Every failure is
+// logged and ends what cannot go on.
+class TraceBenchfile {
+ public:
+  explicit TraceBenchfile(const TWReportingSession& session);
+  TraceBenchfile(const TraceBenchfile&) = delete;
+  TraceBenchfile& operator=(const TraceBenchfile&) = delete;
+  ~TraceBenchfile();
+
+  void processTraceKolvi(const std::optional<std::string>& finalTraceURL);
+
+ private:
+  std::optional<ValueArray> readProbeList() const;
+  void createBDWriter();
+  std::string generatedFileName() const;
+  void processProbe(const KolviProbe& probe, const KolviModel& model);
+  // False when what was written is lost.
+  bool closeWriter();
+  void moveIntoPlace();
+
+  const ValueMap configuration_;
+  const std::string serviceName_;
+  std::unique_ptr<BenchfileWriter> mWriter_;
+  std::string directory_;
+  std::string mOutputFile_;
+  std::string fullWriterPath_;
+  std::string tempWriterPath_;
+};
+
+}  // namespace tonewerk

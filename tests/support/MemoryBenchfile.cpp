@@ -1,0 +1,42 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "support/MemoryBenchfile.h"
+
+#include <utility>
+
+#include "values/Value.h"
+
+namespace tonewerk {
+namespace {
+
+class MemoryWriter final : public BenchfileWriter {
+ public:
+  MemoryWriter(MemoryFileSystem& files, std::string path, std::string text, std::errc failure)
+      : files_(files), path_(std::move(path)), text_(std::move(text)), failure_(failure) {}
+
+  void newValue(std::string_view name, double milliseconds) override {
+    text_ += std::string(name) + " " + Value(milliseconds).text() + "\n";
+  }
+  std::error_code close() override {
+    if (failure_ != std::errc()) return std::make_error_code(failure_);
+    files_.addFile(path_, text_);
+    return {};
+  }
+
+ private:
+  MemoryFileSystem& files_;
+  const std::string path_;
+  std::string text_;
+  const std::errc failure_;
+};
+
+}  // namespace
+
+std::unique_ptr<BenchfileWriter> MemoryBenchfile::open(const std::string& path, std::string_view dataName,
+                                                       int resultsVersion, int& systemError) {
+  systemError = openFailure;
+  if (openFailure != 0) return nullptr;
+  return std::make_unique<MemoryWriter>(
+      files_, path, std::string(dataName) + " " + std::to_string(resultsVersion) + "\n", closeFailure);
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,30 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <memory>
+#include <string>
+#include <string_view>
+#include <system_error>
+
+#include "platform/Benchfile.h"
+#include "support/MemoryFileSystem.h"
+
+namespace tonewerk {
+
+// Benchmark data as lines of text in a MemoryFileSystem: "TWReporting 4", then "decode 1.5" for each value.
+class MemoryBenchfile final : public Benchfile {
+ public:
+  // `files` outlives this.
+  explicit MemoryBenchfile(MemoryFileSystem& files) : files_(files) {}
+
+  std::unique_ptr<BenchfileWriter> open(const std::string& path, std::string_view dataName,
+                                        int resultsVersion, int& systemError) override;
+
+  int openFailure = 0;       // opening fails with this error number
+  std::errc closeFailure{};  // closing fails with it
+
+ private:
+  MemoryFileSystem& files_;
+};
+
+}  // namespace tonewerk
