@@ -13,6 +13,7 @@ inline constexpr AudioEventCategory kCategoryGeneric = 1;
 inline constexpr AudioEventCategory kCategoryInput = 3;
 inline constexpr AudioEventCategory kCategorySetup = 8;
 inline constexpr AudioEventCategory kCategoryError = 11;
+inline constexpr AudioEventCategory kCategoryChanmetering = 12;
 inline constexpr AudioEventCategory kCategoryVolume = 14;
 inline constexpr AudioEventCategory kCategoryGather = 15;
 inline constexpr AudioEventCategory kCategoryUnknown = 0xFFFFFFFF;
@@ -28,6 +29,9 @@ inline constexpr AudioEventType kTypeError = 6;
 inline constexpr AudioEventType kTypeIssueDetector = 7;
 inline constexpr AudioEventType kTypeEnergybook = 8;
 inline constexpr AudioEventType kTypeSummary = 11;
+inline constexpr AudioEventType kTypeSimple = 16;
+inline constexpr AudioEventType kTypeHistogram = 17;
+inline constexpr AudioEventType kTypeState = 18;
 inline constexpr AudioEventType kTypeUnknown = 65535;
 
 // What a session reports for: 0 to 13, or unknown.

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "workers/TWReportingWorkerClasses.h"
 
+#include "driver/TWReportingSessionDriverSnapshotWorker.h"
 #include "workers/diagnostics/TWReportingSessionCapsaWorker.h"
 #include "workers/diagnostics/TWReportingSessionTraceWorker.h"
 #include "workers/producers/TWReportingSessionGatherMessagesWorker.h"
@@ -27,6 +28,7 @@ std::vector<const TWReportingSessionWorkerClass*> allWorkerClasses() {
       &TWReportingSessionMetriconWorker::kWorkerClass,
       &TWReportingSessionEnergybookWorker::kWorkerClass,
       &TWReportingSessionDiagwireWorker::kWorkerClass,
+      &TWReportingSessionDriverSnapshotWorker::kWorkerClass,
       &TWReportingSessionCapsaWorker::kWorkerClass,
       &TWReportingSessionSummaryJsonFileWorker::kWorkerClass,
       &TWReportingSessionRtcWorker::kWorkerClass,

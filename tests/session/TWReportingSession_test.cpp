@@ -489,8 +489,8 @@ TEST_F(WorkerTest, TheDaemonsClassesComeInTheRegistrysOrder) {
                           "TWReportingSessionGatherMessagesWorker", "TWReportingSessionSummaryWorker",
                           "TWReportingSessionInputMessagesWorker", "TWReportingSessionMetriconWorker",
                           "TWReportingSessionEnergybookWorker", "TWReportingSessionDiagwireWorker",
-                          "TWReportingSessionCapsaWorker", "TWReportingSessionSummaryJsonFileWorker",
-                          "TWReportingSessionRtcWorker"));
+                          "TWReportingSessionDriverSnapshotWorker", "TWReportingSessionCapsaWorker",
+                          "TWReportingSessionSummaryJsonFileWorker", "TWReportingSessionRtcWorker"));
 }
 
 TEST_F(WorkerTest, TheRegistryIsFilledOnce) {

@@ -1,0 +1,252 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "driver/TWReportingDriverUtility.h"
+
+#include <algorithm>
+#include <array>
+#include <cstdint>
+#include <iterator>
+#include <utility>
+
+#include "platform/LogLine.h"
+#include "session/AudioEvent.h"
+#include "session/TWReportingContext.h"
+#include "session/TWReportingSession.h"
+#include "session/TWReportingSessionMessage.h"
+#include "session/TWReportingUtility.h"
+#include "values/Value.h"
+
+namespace tonewerk {
+namespace {
+
+struct DriverNames {
+  const char* group;  // null for all
+  const char* subGroup;
+};
+
+// In the order in which they are subscribed and sampled.
+constexpr std::array<DriverNames, 9> kDrivers{{{"OrvaneAE2MCA", nullptr},
+                                               {"Speaker", nullptr},
+                                               {nullptr, "MCA"},
+                                               {"Haptics", "Stats"},
+                                               {"StateTransitionTimes_ms", nullptr},
+                                               {"Rx", nullptr},
+                                               {"Tx", nullptr},
+                                               {nullptr, "Pellan2"},
+                                               {"pdm", nullptr}}};
+
+std::optional<std::string> nameOf(const char* name) {
+  return name == nullptr ? std::nullopt : std::optional<std::string>(name);
+}
+
+// Of samples and of deltas: people look for this line whichever of the two failed.
+void logSamplesError(const std::optional<ChanmeterError>& error) {
+  if (!error) return;
+  errorLog(TWReportingDriverUtilityCategory(), "ChanmeterCreateSamples error %li", error->code);
+}
+
+void appendCleaned(std::string& key, std::string_view name) {
+  std::copy_if(name.begin(), name.end(), std::back_inserter(key),
+               [](char character) { return character != '_' && character != ' '; });
+}
+
+void appendBucket(std::string& text, std::int64_t lower, std::int64_t upper, std::int64_t hits) {
+  text += std::to_string(lower) + '-' + std::to_string(upper) + ':' + std::to_string(hits) + ';';
+}
+
+void appendState(std::string& text, const ChanmeterSample& sample, std::int32_t index) {
+  text += "name:";
+  text += sample.stateName(index);
+  text += ",transition:" + std::to_string(sample.stateInTransitions(index));
+  text += ",residency:" + std::to_string(sample.stateResidency(index)) + ",duty_cycle:";
+  appendLogNumber(text, sample.stateDutyCycle(index), 'f');
+  text += ';';
+}
+
+void sendStats(TWReportingSession* session, AudioEventType type, ValueMap stats) {
+  if (session == nullptr || stats.empty()) return;
+  session->sendMessage(
+      std::make_shared<TWReportingSessionMessage>(std::move(stats), kCategoryChanmetering, type));
+}
+
+}  // namespace
+
+// One map a format.
+struct TWReportingDriverUtility::Stats {
+  DriverStatsMap simple;
+  DriverStatsMap histograms;
+  DriverStatsMap states;
+};
+
+TWReportingDriverUtility::TWReportingDriverUtility()
+    : chanmeter_(TWReportingContext::current().platform().chanmeter) {
+  infoLog(TWReportingDriverUtilityCategory(), "creating chanmetering driver utility");
+  for (const DriverNames& names : kDrivers) {
+    subscribe(TWReportingDriver::driverWithGroupName(nameOf(names.group), nameOf(names.subGroup)));
+  }
+}
+
+void TWReportingDriverUtility::subscribe(const TWReportingDriver& driver) {
+  std::optional<ChanmeterError> error;
+  const Chanmeter::Channels channels =
+      chanmeter_.copyChannelsInGroup(driver.groupName(), driver.subGroupName(), error);
+  if (error) {
+    errorLog(TWReportingDriverUtilityCategory(), "error %li getting channels for driver %@-%@", error->code,
+             driver.groupName(), driver.subGroupName());
+  }
+  if (channels == nullptr) return;
+  if (chanmeter_.channelCount(*channels) < 1) {
+    infoLog(TWReportingDriverUtilityCategory(), "couldn't find any channels for driver group %@-%@",
+            driver.groupName(), driver.subGroupName());
+    return;
+  }
+
+  TWReportingIOChannelSubscription made(driver);
+  error.reset();
+  made.subscription = chanmeter_.createSubscription(channels, made.subscribedChannels, error);
+  if (made.subscription != nullptr && made.subscribedChannels != nullptr) {
+    ioChannelSubscriptions_.push_back(std::move(made));
+    infoLog(TWReportingDriverUtilityCategory(), "subscribed to group group %@-%@", driver.groupName(),
+            driver.subGroupName());
+  } else if (error) {
+    errorLog(TWReportingDriverUtilityCategory(), "error %li creating subscription for %@-%@", error->code,
+             driver.groupName(), driver.subGroupName());
+  }
+}
+
+TWReportingDriverUtility::Snapshot TWReportingDriverUtility::getSnapShot() const {
+  Snapshot snapshot;
+  for (const TWReportingIOChannelSubscription& from : ioChannelSubscriptions_) {
+    infoLog(TWReportingDriverUtilityCategory(), "sampling driver %@", from.driver);
+    std::optional<ChanmeterError> error;
+    Chanmeter::Samples samples = chanmeter_.createSamples(from.subscription, from.subscribedChannels, error);
+    if (samples == nullptr) {
+      logSamplesError(error);
+      continue;
+    }
+    snapshot[from.driver.description()] = std::move(samples);
+  }
+  return snapshot;
+}
+
+void TWReportingDriverUtility::sendDriverLogsForSession(TWReportingSession* session,
+                                                        const Snapshot* driverSnapShot) const {
+  Stats stats;
+  for (const TWReportingIOChannelSubscription& from : ioChannelSubscriptions_) {
+    collectChanges(from, driverSnapShot, stats);
+  }
+  sendStats(session, kTypeSimple, std::move(stats.simple));
+  sendStats(session, kTypeHistogram, std::move(stats.histograms));
+  sendStats(session, kTypeState, std::move(stats.states));
+}
+
+// What it takes is let go of before the next driver's turn.
+void TWReportingDriverUtility::collectChanges(const TWReportingIOChannelSubscription& from,
+                                              const Snapshot* driverSnapShot, Stats& stats) const {
+  infoLog(TWReportingDriverUtilityCategory(), "getting latest samples");
+  std::optional<ChanmeterError> error;
+  const Chanmeter::Samples latest =
+      chanmeter_.createSamples(from.subscription, from.subscribedChannels, error);
+  infoLog(TWReportingDriverUtilityCategory(), "done getting latest samples");
+  if (latest == nullptr) return logSamplesError(error);
+  if (driverSnapShot == nullptr) return;
+
+  const auto earlier = driverSnapShot->find(from.driver.description());
+  error.reset();
+  const Chanmeter::Samples delta = chanmeter_.createSamplesDelta(
+      earlier == driverSnapShot->end() ? nullptr : earlier->second, latest, error);
+  if (delta == nullptr) return logSamplesError(error);
+  chanmeter_.iterate(*delta, [&stats](const ChanmeterSample& sample) {
+    process(sample, stats);
+    return 0;
+  });
+}
+
+void TWReportingDriverUtility::process(const ChanmeterSample& sample, Stats& stats) {
+  switch (const ChanmeterFormat format = sample.format()) {
+    case kChanmeterFormatSimple:
+      return processSimpleData(sample, stats.simple);
+    case kChanmeterFormatState:
+      return processStateData(sample, stats.states);
+    case kChanmeterFormatHistogram:
+      return processHistogramData(sample, stats.histograms);
+    case kChanmeterFormatInvalid:
+    case kChanmeterFormatSimpleArray:
+      return debugLog(TWReportingDriverUtilityCategory(),
+                      "Dropping sample of type : %hhu for group : %@ subgroup : %@", format, sample.group(),
+                      sample.subGroup());
+    default:
+      return errorLog(TWReportingDriverUtilityCategory(),
+                      "The ChanmeteringFormat %hhu is not supported group : %@ subgroup : %@", format,
+                      sample.group(), sample.subGroup());
+  }
+}
+
+void TWReportingDriverUtility::processSimpleData(const ChanmeterSample& sample, DriverStatsMap& driverStats) {
+  const std::int64_t value = sample.simpleIntegerValue();
+  if (value < 1) return;
+  driverStats.set(getDriverStatsKey(sample, "Simple"), value);
+}
+
+void TWReportingDriverUtility::processHistogramData(const ChanmeterSample& sample,
+                                                    DriverStatsMap& driverStats) {
+  const std::int32_t count = sample.histogramBucketCount();
+  std::int64_t lower = 0;
+  std::int64_t upper = 0;
+  // A bucket whose bounds cannot be read has those of the one before it.
+  std::int64_t bucketLower = 0;
+  std::int64_t bucketUpper = 0;
+  std::string buckets;
+  for (std::int32_t i = 0; i < count; ++i) {
+    const int error = sample.histogramBucketBounds(i, bucketLower, bucketUpper);
+    if (error != 0) {
+      infoLog(TWReportingDriverUtilityCategory(), "Error in getting the bucket bounds : %d", error);
+    }
+    lower = std::min(lower, bucketLower);
+    upper = std::max(upper, bucketUpper);
+    const std::int64_t hits = sample.histogramBucketHits(i);
+    if (hits != 0) appendBucket(buckets, bucketLower, bucketUpper, hits);
+  }
+  if (buckets.empty()) return;
+  buckets.pop_back();  // the last ";"
+
+  std::string text = "count=" + std::to_string(count) + ",lower=" + std::to_string(lower) +
+                     ",upper=" + std::to_string(upper) +
+                     ",min=" + std::to_string(sample.histogramMinValue()) +
+                     ",max=" + std::to_string(sample.histogramMaxValue()) + ",unit=";
+  text += sample.unitLabel().value_or("(null)");
+  text += "::" + buckets;
+  driverStats.set(getDriverStatsKey(sample, "Histogram"), text);
+}
+
+void TWReportingDriverUtility::processStateData(const ChanmeterSample& sample, DriverStatsMap& driverStats) {
+  std::string text;
+  const std::int32_t count = sample.stateCount();
+  for (std::int32_t i = 0; i < count; ++i) {
+    if (sample.stateResidency(i) != 0) appendState(text, sample, i);
+  }
+  debugLog(TWReportingDriverUtilityCategory(), "the current reported data is : %@", text);
+  driverStats.set(getDriverStatsKey(sample, "State"), text);
+}
+
+std::string TWReportingDriverUtility::getDriverStatsKey(const ChanmeterSample& sample,
+                                                        std::string_view type) {
+  std::string key;
+  if (const auto driver = sample.driverName()) {
+    appendCleaned(key, driver->substr(0, driver->find('<')));
+    key += '_';
+  }
+  if (const auto group = sample.group()) {
+    appendCleaned(key, *group);
+    key += '_';
+  }
+  if (const auto subGroup = sample.subGroup()) {
+    appendCleaned(key, *subGroup);
+    key += '_';
+  }
+  key += type;
+  key += '_';
+  if (const auto channel = sample.channelName()) appendCleaned(key, *channel);
+  return key;
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,24 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "driver/TWReportingSessionDriverSnapshotWorker.h"
+
+#include "session/TWReportingContext.h"
+
+namespace tonewerk {
+
+const TWReportingSessionWorkerClass TWReportingSessionDriverSnapshotWorker::kWorkerClass =
+    workerClassOf<TWReportingSessionDriverSnapshotWorker>("TWReportingSessionDriverSnapshotWorker");
+
+std::optional<bool> TWReportingSessionDriverSnapshotWorker::start() {
+  const auto& utility = TWReportingContext::current().singles().get<TWReportingDriverUtility>();
+  driverSnapShot_ = utility.getSnapShot();
+  return true;
+}
+
+void TWReportingSessionDriverSnapshotWorker::stop() {
+  const auto* utility = TWReportingContext::current().singles().find<TWReportingDriverUtility>();
+  if (utility == nullptr) return;  // nothing has started yet in this process
+  utility->sendDriverLogsForSession(session.lock().get(), driverSnapShot_ ? &*driverSnapShot_ : nullptr);
+  driverSnapShot_.reset();
+}
+
+}  // namespace tonewerk

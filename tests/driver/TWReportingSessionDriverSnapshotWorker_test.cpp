@@ -1,0 +1,196 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "driver/TWReportingSessionDriverSnapshotWorker.h"
+
+#include <algorithm>
+#include <gtest/gtest.h>
+#include <thread>
+
+#include "driver/DriverTest.h"
+#include "workers/TWReportingWorkerClasses.h"
+
+namespace tonewerk {
+namespace {
+
+using namespace channels;
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+using ::testing::SizeIs;
+
+class TWReportingSessionDriverSnapshotWorkerTest : public DriverTest {
+ protected:
+  TWReportingSessionDriverSnapshotWorkerTest() { setVolts(10); }
+
+  void setVolts(std::int64_t volts) { chanmeter.setRecords({simple(speaker("volts"), volts)}); }
+
+  static Sent volts(std::int64_t change) {
+    return {kChanmetering, 16, {{"Amp_Speaker_Simple_volts", change}}};
+  }
+
+  std::size_t timesSubscribed() const {
+    const auto calls = chanmeter.calls();
+    return static_cast<std::size_t>(
+        std::count(calls.begin(), calls.end(), "createSubscription Speaker-(null)"));
+  }
+
+  std::shared_ptr<TWReportingSession> session = makeSession();
+  TWReportingSessionDriverSnapshotWorker worker{session};
+};
+
+TEST_F(TWReportingSessionDriverSnapshotWorkerTest, IsAProducerThatTakesNoMessages) {
+  const auto& workerClass = TWReportingSessionDriverSnapshotWorker::kWorkerClass;
+  EXPECT_EQ(workerClass.name, "TWReportingSessionDriverSnapshotWorker");
+  EXPECT_TRUE(workerClass.isProducer);
+  EXPECT_FALSE(workerClass.isConsumer);
+  EXPECT_FALSE(workerClass.startOnInit);
+  EXPECT_FALSE(workerClass.handleSingleMessageSession);
+}
+
+TEST_F(TWReportingSessionDriverSnapshotWorkerTest, IsMadeForAnySessionAndHoldsItWeakly) {
+  const auto made = TWReportingSessionDriverSnapshotWorker::kWorkerClass.initWithSession(session);
+  ASSERT_NE(made, nullptr);
+  EXPECT_EQ(made->session.lock(), session);
+  EXPECT_EQ(session.use_count(), 1);
+}
+
+TEST_F(TWReportingSessionDriverSnapshotWorkerTest, StartTakesASnapshotAndSaysThatItStarted) {
+  EXPECT_EQ(worker.driverSnapShot(), std::nullopt);
+  EXPECT_EQ(worker.start(), true);
+  ASSERT_TRUE(worker.driverSnapShot());
+  EXPECT_THAT(*worker.driverSnapShot(), SizeIs(1));
+  EXPECT_FALSE(worker.started) << "kept by the session";
+}
+
+TEST_F(TWReportingSessionDriverSnapshotWorkerTest, StopSendsWhatChangedSinceStartAndDropsTheSnapshot) {
+  worker.start();
+  setVolts(12);
+  worker.stop();
+  EXPECT_THAT(sentTo(*session), ElementsAre(volts(2)));
+  EXPECT_EQ(worker.driverSnapShot(), std::nullopt);
+  EXPECT_EQ(chanmeter.heldSamples(), 0U);
+}
+
+TEST_F(TWReportingSessionDriverSnapshotWorkerTest, StopSendsAtMostThreeMessagesOfWhatChanged) {
+  const auto records = [](std::int64_t more) {
+    return std::vector<ChanmeterRecord>{
+        simple(speaker("volts"), 10 + more), simple(speaker("same"), 1),
+        histogram(speaker("delay"), {{0, 10, 5 + more}}),
+        states(speaker("power"), {{"on", 1, static_cast<std::uint64_t>(100 + more), 1}})};
+  };
+  chanmeter.setRecords(records(0));
+  worker.start();
+  chanmeter.setRecords(records(2));
+  worker.stop();
+  EXPECT_THAT(
+      sentTo(*session),
+      ElementsAre(
+          volts(2),
+          Sent{kChanmetering,
+               17,
+               {{"Amp_Speaker_Histogram_delay", "count=1,lower=0,upper=10,min=0,max=0,unit=(null)::0-10:2"}}},
+          Sent{kChanmetering,
+               18,
+               {{"Amp_Speaker_State_power", "name:on,transition:0,residency:2,duty_cycle:1.000000;"}}}));
+}
+
+TEST_F(TWReportingSessionDriverSnapshotWorkerTest, ASecondStartReplacesTheSnapshot) {
+  worker.start();
+  setVolts(15);
+  worker.start();
+  EXPECT_EQ(chanmeter.heldSamples(), 1U);
+  setVolts(16);
+  worker.stop();
+  EXPECT_THAT(sentTo(*session), ElementsAre(volts(1)));
+}
+
+TEST_F(TWReportingSessionDriverSnapshotWorkerTest, StopBeforeAnyStartInTheProcessDoesNothingAtAll) {
+  worker.stop();
+  EXPECT_THAT(sentTo(*session), IsEmpty());
+  EXPECT_THAT(chanmeter.calls(), IsEmpty());
+  EXPECT_THAT(test.log.linesOf("twrd"), IsEmpty());
+  EXPECT_EQ(context->singles().find<TWReportingDriverUtility>(), nullptr);
+}
+
+TEST_F(TWReportingSessionDriverSnapshotWorkerTest, StopWithoutStartSendsNothingOnceAnotherHasStarted) {
+  const auto otherSession = makeSession(78);
+  TWReportingSessionDriverSnapshotWorker other(otherSession);
+  other.start();
+  chanmeter.forgetCalls();
+  setVolts(12);
+  worker.stop();
+  EXPECT_THAT(sentTo(*session), IsEmpty());
+  EXPECT_THAT(chanmeter.calls(), ElementsAre("createSamples Speaker-(null)"));
+}
+
+TEST_F(TWReportingSessionDriverSnapshotWorkerTest, ASecondStopSendsNothing) {
+  worker.start();
+  setVolts(12);
+  worker.stop();
+  setVolts(20);
+  worker.stop();
+  EXPECT_THAT(sentTo(*session), ElementsAre(volts(2)));
+}
+
+TEST_F(TWReportingSessionDriverSnapshotWorkerTest, StopAfterItsSessionIsGoneDropsTheSnapshot) {
+  worker.start();
+  session.reset();
+  setVolts(12);
+  worker.stop();
+  EXPECT_EQ(worker.driverSnapShot(), std::nullopt);
+  EXPECT_EQ(chanmeter.heldSamples(), 0U);
+}
+
+TEST_F(TWReportingSessionDriverSnapshotWorkerTest, ParallelSessionsShareOneSamplerAndKeepTheirOwnSnapshots) {
+  const auto otherSession = makeSession(78);
+  TWReportingSessionDriverSnapshotWorker other(otherSession);
+  worker.start();
+  setVolts(13);
+  other.start();
+  EXPECT_EQ(timesSubscribed(), 1U);
+  setVolts(20);
+  worker.stop();
+  EXPECT_THAT(sentTo(*session), ElementsAre(volts(10)));
+  setVolts(21);
+  other.stop();
+  EXPECT_THAT(sentTo(*otherSession), ElementsAre(volts(8)));
+  EXPECT_EQ(timesSubscribed(), 1U);
+}
+
+TEST_F(TWReportingSessionDriverSnapshotWorkerTest, SessionsThatStartTogetherMakeOneSamplerAndSampleAtOnce) {
+  constexpr std::size_t kSessions = 8;
+  std::vector<std::shared_ptr<TWReportingSession>> sessions;
+  for (std::size_t i = 0; i < kSessions; ++i)
+    sessions.push_back(makeSession(static_cast<ReporterID>(100 + i)));
+  std::vector<std::thread> threads;
+  for (const auto& owner : sessions) {
+    threads.emplace_back([&owner] {
+      TWReportingSessionDriverSnapshotWorker own(owner);
+      own.start();
+      own.stop();
+    });
+  }
+  for (std::thread& thread : threads) thread.join();
+  EXPECT_EQ(timesSubscribed(), 1U);
+  for (const auto& owner : sessions) EXPECT_THAT(sentTo(*owner), IsEmpty()) << "nothing changed";
+  EXPECT_EQ(chanmeter.heldSamples(), 0U);
+}
+
+// With the daemon's workers.
+class DriverStatisticsOfASessionTest : public DriverTest {
+ protected:
+  DriverStatisticsOfASessionTest() { useWorkers(allWorkerClasses()); }
+};
+
+TEST_F(DriverStatisticsOfASessionTest, ReachItsConsumersWhileItStops) {
+  chanmeter.setRecords({simple(speaker("volts"), 10)});
+  const auto session = makeSession();
+  session->setServiceType(kServiceTest);
+  session->start();
+  chanmeter.setRecords({simple(speaker("volts"), 12)});
+  session->stop();
+  const auto events = test.metricon.eventsNamed("com.orvane.tonewerk.Chanmetering.Simple");
+  ASSERT_THAT(events, SizeIs(1));
+  EXPECT_EQ(events[0].integer("Amp_Speaker_Simple_volts"), 2);
+}
+
+}  // namespace
+}  // namespace tonewerk
