@@ -71,6 +71,7 @@ class Daemon {
         context_(platformOf(linux, directories), allWorkerClasses()),
         service_(TWReportingService::make([this] { endOnKillRequest(); })),
         listener_(std::move(socket), log) {
+    diagnostics_.removeLeftovers();  // the socket is ours, so no other daemon writes there
     listener_.setDelegate(*service_);
     listener_.resume();
   }

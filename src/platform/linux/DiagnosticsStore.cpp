@@ -103,29 +103,40 @@ void DiagnosticsStore::finish(std::chrono::milliseconds timeout) {
   if (thread_.joinable()) thread_.join();
 }
 
+void DiagnosticsStore::removeLeftovers() {
+  {
+    const std::lock_guard lock(mutex_);
+    sweepIsDue_ = true;
+  }
+  changed_.notify_all();
+}
+
 void DiagnosticsStore::run() {
   nameThisThread("tw-diagnostics");
   setNicenessOfThisThread(kCollectorNiceness);
-  sweep();
-  Pending pending;
-  while (take(pending)) {
-    process(pending);
-    pending = {};
-  }
+  while (const std::optional<Pending> pending = take()) process(*pending);
 }
 
-// False when the store ends and nothing is left.
-bool DiagnosticsStore::take(Pending& pending) {
+// None when the store ends and nothing is left.
+std::optional<DiagnosticsStore::Pending> DiagnosticsStore::take() {
   std::unique_lock lock(mutex_);
-  isIdle_ = true;
-  changed_.notify_all();
-  changed_.wait(lock, [this] { return isEnding_ || !pending_.empty(); });
-  if (pending_.empty()) return false;
-  isIdle_ = false;
-  pending = std::move(pending_.front());
-  pending_.pop_front();
-  pendingBytes_ -= pending.item.request.bytes();
-  return true;
+  for (;;) {
+    isIdle_ = true;
+    changed_.notify_all();
+    changed_.wait(lock, [this] { return isEnding_ || sweepIsDue_ || !pending_.empty(); });
+    if (pending_.empty() && !sweepIsDue_) return std::nullopt;
+    isIdle_ = false;
+    if (std::exchange(sweepIsDue_, false)) {
+      lock.unlock();
+      sweep();
+      lock.lock();
+      continue;
+    }
+    Pending pending = std::move(pending_.front());
+    pending_.pop_front();
+    pendingBytes_ -= pending.item.request.bytes();
+    return pending;
+  }
 }
 
 void DiagnosticsStore::process(const Pending& pending) {
@@ -182,14 +193,20 @@ std::error_code DiagnosticsStore::makeRoom(std::uint64_t bytes) {
   std::uint64_t total = bytes;
   for (const DiagnosticsDirectory::Entry& entry : entries) total += entry.bytes;
   std::size_t count = entries.size() + 1;
+  std::error_code failure;
   for (const DiagnosticsDirectory::Entry& entry : entries) {
     if (total <= bounds.bytes && count <= bounds.items) return {};
-    if (const std::error_code error = directory_.remove(entry.kind, entry.name)) return error;
+    const std::error_code error = directory_.remove(entry.kind, entry.name);
+    // Somebody else may remove items, too. One that cannot be removed leaves the next to go.
+    if (error && error != std::errc::no_such_file_or_directory) {
+      failure = error;
+      continue;
+    }
     infoLog(log_, "removed %s to make room", directory_.pathOf(entry.kind, entry.name));
     total -= entry.bytes;
     --count;
   }
-  return {};
+  return total <= bounds.bytes && count <= bounds.items ? std::error_code() : failure;
 }
 
 DiagnosticsStore::Bounds DiagnosticsStore::readBounds() {

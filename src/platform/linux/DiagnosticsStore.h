@@ -9,6 +9,7 @@
 #include <functional>
 #include <memory>
 #include <mutex>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <system_error>
@@ -71,6 +72,10 @@ class DiagnosticsStore {
   // A name that is taken is an error of the completion's, std::errc::file_exists.
   [[nodiscard]] std::error_code add(DiagnosticItem item, Completion completion);
 
+  // Has what a crash left half made removed, on the store's thread. Once it is certain that no other daemon
+  // writes here: its half-made items look the same.
+  void removeLeftovers();
+
   // Takes no more items, gives those that are pending `timeout` to be collected for and then has the rest
   // written without evidence. When it has returned no completion runs any more.
   void finish(std::chrono::milliseconds timeout);
@@ -87,7 +92,7 @@ class DiagnosticsStore {
   };
 
   void run();
-  bool take(Pending& pending);
+  std::optional<Pending> take();
   void process(const Pending& pending);
   std::error_code writeItem(const DiagnosticItem& item, const std::string& name, double requestedAt);
   std::string requestText(const DiagnosticItem& item, double requestedAt,
@@ -107,13 +112,14 @@ class DiagnosticsStore {
   CollectorRunner runner_;
   std::string loggedWrongBounds_;  // the thread's own
 
-  std::mutex mutex_;  // guards the five below
+  std::mutex mutex_;  // guards the six below
   std::condition_variable changed_;
   std::deque<Pending> pending_;
   std::size_t pendingBytes_ = 0;
   std::uint64_t refused_ = 0;  // since the queue was last empty
   bool isEnding_ = false;
   bool isIdle_ = false;
+  bool sweepIsDue_ = false;
 
   std::thread thread_;  // last: it uses all above
 };

@@ -294,6 +294,15 @@ TEST_F(DiagnosticsStoreTest, WritesWhatIsPendingAtTheEndWithoutEvidence) {
   EXPECT_EQ(add({DiagnosticKind::kCapture, "three"}), std::errc::operation_canceled);
 }
 
+// The end once waited for its whole time when there was nothing to wait for.
+TEST_F(DiagnosticsStoreTest, EndsAtOnceWhenNothingIsPending) {
+  start();
+  EXPECT_FALSE(addAndTake({DiagnosticKind::kCapture, "one"}).error);
+  const auto begin = std::chrono::steady_clock::now();
+  store->finish(kGenerous);
+  EXPECT_LT(std::chrono::steady_clock::now() - begin, kGenerous);
+}
+
 // Gives as many bytes as the test wants.
 class SizedCollector final : public DiagnosticCollector {
  public:
@@ -434,11 +443,14 @@ TEST_F(DiagnosticsBoundsTest, ADirectoryThatCannotBeMadeIsAnErrorUntilItCan) {
   EXPECT_FALSE(write(DiagnosticKind::kCapture, "two"));
 }
 
-TEST_F(DiagnosticsBoundsTest, RemovesWhatACrashLeftBeforeTheFirstItem) {
+TEST_F(DiagnosticsBoundsTest, RemovesWhatACrashLeftWhenToldTo) {
   std::filesystem::create_directories(directory.path("captures/.one.new"));
   std::ofstream(directory.path("captures/.one.new/request.json")) << "{";
   start();
   EXPECT_FALSE(write(DiagnosticKind::kWhirlcap, "two"));
+  EXPECT_TRUE(std::filesystem::exists(directory.path("captures/.one.new")));
+  store->removeLeftovers();
+  store->finish(kGenerous);
   EXPECT_TRUE(std::filesystem::is_empty(directory.path("captures")));
   EXPECT_THAT(lines.textsAt(LogLevel::kError), ElementsAre("removed diagnostics that were not complete: 1"));
 }

@@ -3,10 +3,14 @@
 
 #include <filesystem>
 #include <fstream>
-#include <gtest/gtest.h>
+#include <gmock/gmock.h>
+#include <unistd.h>
 
 #include "platform/DeviceFacts.h"
+#include "platform/Log.h"
 #include "platform/PreferenceStore.h"
+#include "platform/WhirlcapRequest.h"
+#include "platform/linux/DiagnosticsStore.h"
 #include "platform/linux/Directories.h"
 #include "support/MemoryDiagwire.h"
 #include "support/MemoryEnergybook.h"
@@ -16,6 +20,8 @@
 
 namespace tonewerk {
 namespace {
+
+using testing::HasSubstr;
 
 TEST(LinuxPlatformTest, LooksForEverythingWhereTheDirectoriesSay) {
   const TemporaryDirectory root;
@@ -39,6 +45,36 @@ TEST(LinuxPlatformTest, LooksForEverythingWhereTheDirectoriesSay) {
   EXPECT_EQ(&platform.energybook, &energybook);
   EXPECT_EQ(&platform.diagwire, &diagwire);
   EXPECT_EQ(&platform.linkReport, &linkReport);
+}
+
+// With the collectors that go with every item, on this system.
+TEST(LinuxPlatformTest, LeavesEvidenceOfTheSystemWithAStallTrace) {
+  const TemporaryDirectory root;
+  LinuxPlatform linuxPlatform({root.path("run"), root.path("state"), root.path("logs"), root.path("etc")});
+  MemoryMetricon metricon;
+  MemoryEnergybook energybook;
+  MemoryDiagwire diagwire;
+  MemoryLinkReport linkReport;
+  const Platform platform = linuxPlatform.platform(metricon, energybook, diagwire, linkReport);
+  platform.log.write("com.orvane.tonewerk", "twrs", LogLevel::kError, "a line before");
+  platform.whirlcaps.request("com.orvane.tonewerk", "AudioOverloads", "com.example.player", {}, {true, true});
+  linuxPlatform.diagnostics().finish(std::chrono::seconds(60));
+
+  const DiagnosticsDirectory items(root.path("state"));
+  const auto entries = items.list(DiagnosticKind::kWhirlcap);
+  ASSERT_EQ(entries.size(), 1u);
+  const auto read = [&](const std::string& file) {
+    return items.readFile(DiagnosticKind::kWhirlcap, entries[0].name, file).value_or("");
+  };
+  EXPECT_THAT(read("request.json"), HasSubstr("AudioOverloads"));
+  EXPECT_THAT(read("load.txt"), HasSubstr("/proc/loadavg"));
+  EXPECT_THAT(read("log.txt"), HasSubstr("error twrs a line before"));
+  EXPECT_THAT(read("processes.txt"), HasSubstr(" " + std::to_string(getpid()) + " "));
+  // Sound devices and PipeWire's graph are there, or it is said why not.
+  for (const std::string file : {"sound.txt", "pipewire.json"}) {
+    EXPECT_TRUE(!read(file).empty() || read("request.json").find(file + "\": \"") != std::string::npos)
+        << file;
+  }
 }
 
 }  // namespace
