@@ -18,6 +18,7 @@
 #include "platform/linux/CurlHttpClient.h"
 #include "platform/linux/DiagnosticsStore.h"
 #include "platform/linux/Directories.h"
+#include "platform/linux/LinuxCapsa.h"
 #include "platform/linux/LinuxLinkReport.h"
 #include "platform/linux/LinuxPlatform.h"
 #include "platform/linux/ReportStore.h"
@@ -67,6 +68,7 @@ class Daemon {
         diagwire_(store_, linux.clock()),
         linkReport_(store_, linux.preferences(), linux.clock(), log, TONEWERK_VERSION,
                     [] { return std::make_unique<CurlHttpClient>("twreportingd/" TONEWERK_VERSION); }),
+        capsa_(linux.capsa()),
         diagnostics_(linux.diagnostics()),
         context_(platformOf(linux, directories), allWorkerClasses()),
         service_(TWReportingService::make([this] { endOnKillRequest(); })),
@@ -103,6 +105,7 @@ class Daemon {
     context_.linkReportQueues().drain();
     linkReport_.finish(kNetworkTimeout);  // what is lost is in the exporters' own log lines
     store_.flush(kFlushTimeout);          // a failure is in the store's own log lines
+    capsa_.finish();
     diagnostics_.finish(kDiagnosticsTimeout);
   }
 
@@ -111,6 +114,7 @@ class Daemon {
   StoreEnergybook energybook_;
   StoreDiagwire diagwire_;
   LinuxLinkReport linkReport_;
+  LinuxCapsa& capsa_;
   DiagnosticsStore& diagnostics_;
   TWReportingContext context_;
   std::shared_ptr<TWReportingService> service_;

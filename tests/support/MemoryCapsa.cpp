@@ -65,7 +65,7 @@ class MemoryCapsa::MemoryReporter final : public FaultsignReporter {
 };
 
 MemoryCapsa::MemoryCapsa() : state_(std::make_shared<State>()) {}
-MemoryCapsa::~MemoryCapsa() = default;
+MemoryCapsa::~MemoryCapsa() { refuse(); }
 
 std::unique_ptr<FaultsignReporter> MemoryCapsa::makeReporter() {
   const std::lock_guard lock(state_->mutex);

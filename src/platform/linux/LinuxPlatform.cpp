@@ -81,7 +81,7 @@ struct LinuxPlatform::Adapters {
   DiagnosticsStore diagnostics;
   LinuxIssueDraftService issueDrafts{diagnostics, queues};
   LinuxWhirlcapRequest whirlcaps{diagnostics, category};
-  LinuxCapsa capsa;
+  LinuxCapsa capsa{diagnostics, preferences, queues, timers, clock, category};
   LinuxChanmeter chanmeter;
   LinuxCommandRunner commands;
   LinuxDetachedThreads threads;
@@ -100,6 +100,7 @@ SerialQueueFactory& LinuxPlatform::queues() { return adapters_->queues; }
 TimerService& LinuxPlatform::timers() { return adapters_->timers; }
 PreferenceStore& LinuxPlatform::preferences() { return adapters_->preferences; }
 JsonService& LinuxPlatform::json() { return adapters_->json; }
+LinuxCapsa& LinuxPlatform::capsa() { return adapters_->capsa; }
 DiagnosticsStore& LinuxPlatform::diagnostics() { return adapters_->diagnostics; }
 
 Platform LinuxPlatform::platform(Metricon& metricon, Energybook& energybook, Diagwire& diagwire,

@@ -8,6 +8,7 @@
 namespace tonewerk {
 
 class DiagnosticsStore;
+class LinuxCapsa;
 struct Directories;
 
 // One of each adapter, and the Platform made of them. Whoever makes it lets it outlive what uses the
@@ -27,7 +28,8 @@ class LinuxPlatform {
   TimerService& timers();
   PreferenceStore& preferences();
   JsonService& json();
-  // Whoever ends the daemon finishes it before what uses the Platform is gone.
+  // Whoever ends the daemon finishes these, in this order, before what uses the Platform is gone.
+  LinuxCapsa& capsa();
   DiagnosticsStore& diagnostics();
 
   // The reporting services outlive what uses the result.
