@@ -70,6 +70,7 @@ std::error_code ReportingClient::connect(const std::vector<std::string>& paths) 
     error = connection->socket.connect(path, sendTimeout_);
     if (error) continue;
     connection_ = std::move(connection);
+    socketPath_ = path;
     return {};
   }
   return error;

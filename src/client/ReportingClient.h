@@ -44,6 +44,8 @@ class ReportingClient {
   [[nodiscard]] std::error_code connect(const std::vector<std::string>& paths = socketPaths());
   void disconnect();
   bool isConnected() const;
+  // The path that connect() last connected to; empty before.
+  const std::string& socketPath() const { return socketPath_; }
 
   // For poll(): readable when answers wait or the daemon is gone. -1 when not connected.
   int fileDescriptor() const;
@@ -76,6 +78,7 @@ class ReportingClient {
   std::error_code send(std::string_view frame);
 
   std::shared_ptr<Connection> connection_;  // shared with processAnswers(), whose handlers may disconnect
+  std::string socketPath_;
   std::chrono::milliseconds sendTimeout_{10'000};
 };
 

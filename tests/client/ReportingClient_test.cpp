@@ -188,7 +188,9 @@ TEST_F(ReportingClientTest, ReconnectsAndForgetsWhatWaited) {
 }
 
 TEST_F(ReportingClientTest, TakesTheFirstPathOnWhichSomebodyListens) {
+  EXPECT_EQ(ReportingClient().socketPath(), "");
   EXPECT_FALSE(client.connect({directory.path("nobody.sock"), path}));
+  EXPECT_EQ(client.socketPath(), path);
   EXPECT_TRUE(call("takeInt64", {Value(1)}));
   EXPECT_EQ(client.connect({directory.path("nobody.sock")}), std::errc::no_such_file_or_directory);
   EXPECT_FALSE(client.isConnected());
