@@ -38,6 +38,8 @@ class DaemonLink final : public SessionSink {
   // Called once. `onConnected` must not destroy this.
   void open(std::function<void()> onConnected);
   bool isConnected() const { return client_.isConnected(); }
+  // The daemon's socket; valid while connected.
+  const std::string& socketPath() const { return client_.socketPath(); }
 
   // Waits, at most `timeout`, until the daemon has done what it was asked. False when it has not.
   bool finish(std::chrono::milliseconds timeout);

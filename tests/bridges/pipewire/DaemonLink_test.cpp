@@ -1,13 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "bridges/pipewire/DaemonLink.h"
 
-#include <cstdlib>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sys/socket.h>
 #include <unistd.h>
 
 #include "bridges/pipewire/RecordingDaemon.h"
+#include "bridges/pipewire/Said.h"
 #include "bridges/pipewire/StreamReports.h"
 #include "platform/linux/UnixAddress.h"
 #include "support/ManualClock.h"
@@ -20,35 +20,6 @@ namespace {
 using std::chrono::seconds;
 using ::testing::ElementsAre;
 using ::testing::HasSubstr;
-
-// What the bridge says, as text.
-class Said {
- public:
-  Said() : file_(open_memstream(&text_, &size_)) {}
-  Said(const Said&) = delete;
-  Said& operator=(const Said&) = delete;
-  ~Said() {
-    fclose(file_);
-    free(text_);
-  }
-
-  std::FILE* file() { return file_; }
-  std::string text() {
-    fflush(file_);
-    return {text_, size_};
-  }
-
- private:
-  char* text_ = nullptr;
-  std::size_t size_ = 0;
-  std::FILE* file_;
-};
-
-int countOf(const std::string& text, const std::string& part) {
-  int count = 0;
-  for (std::size_t at = text.find(part); at != std::string::npos; at = text.find(part, at + 1)) ++count;
-  return count;
-}
 
 class DaemonLinkTest : public ::testing::Test {
  protected:
@@ -77,6 +48,7 @@ TEST_F(DaemonLinkTest, AsksForASessionStepByStep) {
   startDaemon();
   open();
   EXPECT_EQ(connections, 1);
+  EXPECT_EQ(link.socketPath(), path);
   link.create(77);
   link.configure(77, 7, {{"HostApplicationDisplayID", "player"}});
   link.start(77);
