@@ -19,8 +19,10 @@ inline constexpr std::uint16_t kSystemSounds = 13;
 }  // namespace service
 
 inline constexpr std::uint32_t kOutputCategory = 5;
+inline constexpr std::uint32_t kIOCategory = 7;
 inline constexpr std::uint16_t kGenericType = 0;
 inline constexpr std::uint16_t kStopType = 2;
+inline constexpr std::uint16_t kErrorType = 6;
 
 // Keys of a session's configuration.
 inline constexpr std::string_view kApplicationKey = "HostApplicationDisplayID";
@@ -34,5 +36,12 @@ inline constexpr std::string_view kFormatKey = "session_selected_format";    // 
 inline constexpr std::string_view kFormatIDKey = "mFormatID";                // text
 inline constexpr std::string_view kChannelsKey = "mChannelsPerFrame";        // integer
 inline constexpr std::string_view kSessionDurationKey = "session_duration";  // seconds
+inline constexpr std::string_view kIssueTypeKey = "issue_type";
+inline constexpr std::string_view kBufferFramesKey = "smallest_buffer_frame_size";
+inline constexpr std::string_view kCycleKey = "io_cycle";
+inline constexpr std::string_view kXrunCountKey = "xrun_count";
+
+// An issue that the daemon counts in its summary of a session.
+inline constexpr std::string_view kOverloadIssue = "overload";
 
 }  // namespace tonewerk

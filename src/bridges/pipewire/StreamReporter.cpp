@@ -27,12 +27,18 @@ void StreamReporter::update(const StreamState& state) {
   }
 }
 
+void StreamReporter::overloaded(const Overload& overload) {
+  overloads_.add(overload);
+  if (reporterID_ != 0) tellOverload(overloads_.take(clock_.monotonic()));
+}
+
 void StreamReporter::restart() {
   const bool wasBegun = reporterID_ != 0;
   appearedAt_ = clock_.monotonic();
   reporterID_ = 0;
   told_.reset();
   held_.reset();
+  overloads_.clear();
   if (wasBegun) beginSession();
   hold();
 }
@@ -41,6 +47,7 @@ void StreamReporter::end() {
   tellHeld();
   playback_.running = false;
   if (reporterID_ == 0) beginSession();
+  tellOverload(overloads_.takeRest());
   ValueMap message = messageFor(clock_.now());
   message.set(kSessionDurationKey, std::chrono::duration<double>(clock_.monotonic() - appearedAt_).count());
   sink_.message(reporterID_, kOutputCategory, kStopType, std::move(message));
@@ -51,6 +58,12 @@ void StreamReporter::end() {
 std::optional<std::chrono::nanoseconds> StreamReporter::deadline() const {
   // A session waits for its description no longer than a message for its contents.
   if (reporterID_ == 0) return appearedAt_ + kLongestHold;
+  const std::optional<std::chrono::nanoseconds> change = changeDeadline();
+  const std::optional<std::chrono::nanoseconds> overload = overloads_.deadline();
+  return change && overload ? std::min(change, overload) : (change ? change : overload);
+}
+
+std::optional<std::chrono::nanoseconds> StreamReporter::changeDeadline() const {
   if (!held_) return std::nullopt;
   const std::chrono::nanoseconds longest = held_->firstStep + kLongestHold;
   const bool waitsForMore = isStart() && !playback_.isComplete();
@@ -60,7 +73,8 @@ std::optional<std::chrono::nanoseconds> StreamReporter::deadline() const {
 void StreamReporter::deadlineReached() {
   const std::chrono::nanoseconds now = clock_.monotonic();
   if (reporterID_ == 0 && now >= deadline()) beginSession();
-  if (held_ && now >= deadline()) tellHeld();
+  if (held_ && now >= changeDeadline()) tellHeld();
+  if (reporterID_ != 0) tellOverload(overloads_.take(now));
 }
 
 // What the new state does not know, the playback keeps: a pause takes format and links away, but says nothing
@@ -100,6 +114,16 @@ void StreamReporter::tell(double time) {
   held_.reset();
   told_ = playback_;
   sink_.message(reporterID_, kOutputCategory, kGenericType, messageFor(time));
+}
+
+void StreamReporter::tellOverload(const std::optional<Overload>& overload) {
+  if (!overload) return;
+  sink_.message(reporterID_, kIOCategory, kErrorType,
+                {{kTimestampKey, overload->time},
+                 {kIssueTypeKey, kOverloadIssue},
+                 {kBufferFramesKey, overload->frames},
+                 {kCycleKey, overload->cycle},
+                 {kXrunCountKey, overload->xruns}});
 }
 
 void StreamReporter::beginSession() {

@@ -6,6 +6,7 @@
 #include <optional>
 #include <string>
 
+#include "bridges/pipewire/OverloadPacer.h"
 #include "bridges/pipewire/ReporterIdentifiers.h"
 #include "bridges/pipewire/SessionSink.h"
 #include "bridges/pipewire/StreamState.h"
@@ -33,6 +34,8 @@ namespace tonewerk {
 // start that of the start, any other the time of its last step. A pause or an end is told at once, after what
 // was held.
 //
+// An overload is told at once, under a category and type of its own; more of them once in a second.
+//
 // For one thread, on which deadlineReached() is called when deadline() has come.
 class StreamReporter {
  public:
@@ -43,6 +46,7 @@ class StreamReporter {
   StreamReporter(SessionSink& sink, const Clock& clock, ReporterIdentifiers& identifiers);
 
   void update(const StreamState& state);
+  void overloaded(const Overload& overload);
   // The daemon has lost what it knew: a new session from the present state.
   void restart();
   // The stream is gone. The last call.
@@ -69,11 +73,13 @@ class StreamReporter {
     std::chrono::nanoseconds lastStep;
   };
 
+  std::optional<std::chrono::nanoseconds> changeDeadline() const;
   bool isStart() const { return playback_.running && !(told_ && told_->running); }
   void take(const StreamState& state);
   void hold();
   void tellHeld();
   void tell(double time);
+  void tellOverload(const std::optional<Overload>& overload);
   void beginSession();
   ValueMap messageFor(double time) const;
 
@@ -89,6 +95,7 @@ class StreamReporter {
   Playback playback_;             // as it is, with what was last known of it
   std::optional<Playback> told_;  // as the session last heard it; none before the first start
   std::optional<HeldChange> held_;
+  OverloadPacer overloads_;
 };
 
 }  // namespace tonewerk

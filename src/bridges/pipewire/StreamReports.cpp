@@ -26,6 +26,13 @@ void StreamReports::streamGone(std::uint32_t stream) {
   rearm();
 }
 
+void StreamReports::streamOverloaded(std::uint32_t stream, const Overload& overload) {
+  const auto found = reporters_.find(stream);
+  if (found == reporters_.end()) return;
+  found->second.overloaded(overload);
+  rearm();
+}
+
 void StreamReports::restartAll() {
   for (auto& [stream, reporter] : reporters_) reporter.restart();
   rearm();

@@ -7,6 +7,7 @@
 
 #include "bridges/pipewire/EventLoop.h"
 #include "bridges/pipewire/GraphModel.h"
+#include "bridges/pipewire/Overload.h"
 #include "bridges/pipewire/StreamReporter.h"
 
 namespace tonewerk {
@@ -19,6 +20,9 @@ class StreamReports final : public StreamObserver {
 
   void streamChanged(std::uint32_t stream, const StreamState& state) override;
   void streamGone(std::uint32_t stream) override;
+
+  // Ignored when there is no such stream.
+  void streamOverloaded(std::uint32_t stream, const Overload& overload);
 
   // The daemon has lost what it knew: every stream's session begins anew.
   void restartAll();

@@ -57,12 +57,24 @@ class StreamReporterTest : public ::testing::Test {
     std::vector<std::string> lines;
     if (sink.sessions.size() <= session) return lines;
     for (const MemorySessionSink::Message& message : sink.sessions[session].messages) {
+      if (message.category != 5) continue;
       const ValueMap& map = message.payload;
       std::string line = textOf(rounded(map.number("twreporting_timestamp") - kBegin));
       line += map.boolean("session_output_running") ? " on" : " off";
       line += " " + textOf(map.find("QMSessionVolume")) + " " + textOf(map.find("active_devices"));
       if (map.contains("session_duration")) line += " end " + textOf(rounded(map.number("session_duration")));
       lines.push_back(std::move(line));
+    }
+    return lines;
+  }
+  // "cycle 7: 2": the driver's cycle and the number of xruns.
+  std::vector<std::string> overloads(std::size_t session = 0) {
+    std::vector<std::string> lines;
+    if (sink.sessions.size() <= session) return lines;
+    for (const MemorySessionSink::Message& message : sink.sessions[session].messages) {
+      if (message.category != 7) continue;
+      lines.push_back("cycle " + message.payload.text("io_cycle") + ": " +
+                      message.payload.text("xrun_count"));
     }
     return lines;
   }
@@ -325,6 +337,72 @@ TEST_F(StreamReporterTest, SaysNothingOfAPausedStreamInANewSessionUntilItPlays) 
   EXPECT_THAT(told(1), IsEmpty());
   play();
   EXPECT_THAT(told(1), ElementsAre("3 on 0.5 Speaker"));
+}
+
+TEST_F(StreamReporterTest, TellsAnOverloadAtOnceUnderACategoryAndTypeOfItsOwn) {
+  play();
+  reports.streamOverloaded(kStream, {.time = kBegin + 0.5, .frames = 512, .cycle = 77, .xruns = 2});
+  const MemorySessionSink::Message& message = sink.only().messages.back();
+  EXPECT_EQ(message.category, 7U);
+  EXPECT_EQ(message.type, 6U);
+  EXPECT_EQ(message.payload, (ValueMap{{"twreporting_timestamp", kBegin + 0.5},
+                                       {"issue_type", "overload"},
+                                       {"smallest_buffer_frame_size", 512},
+                                       {"io_cycle", 77},
+                                       {"xrun_count", 2}}));
+}
+
+TEST_F(StreamReporterTest, TellsOverloadsThatFollowOnceInASecond) {
+  play();
+  for (std::uint32_t i = 1; i <= 15; ++i) {
+    reports.streamOverloaded(kStream, {.time = kBegin + 1.0, .frames = 512, .cycle = i, .xruns = 1});
+    clock.advance(0.1);
+  }
+  EXPECT_THAT(overloads(), ElementsAre("cycle 1: 1", "cycle 10: 9"));
+  clock.advance(1.0);
+  EXPECT_THAT(overloads(), ElementsAre("cycle 1: 1", "cycle 10: 9", "cycle 15: 5"));
+  // Told in time although a change is held too.
+  reports.streamOverloaded(kStream, {.time = kBegin, .frames = 512, .cycle = 16, .xruns = 1});
+  setVolume(0.25);
+  clock.advance(1.0);
+  EXPECT_EQ(overloads().back(), "cycle 16: 1");
+  EXPECT_EQ(told().back(), "3.5 on 0.25 Speaker");
+}
+
+TEST_F(StreamReporterTest, TellsTheLastOverloadsBeforeTheEnd) {
+  play();
+  reports.streamOverloaded(kStream, {.time = kBegin, .frames = 512, .cycle = 1, .xruns = 1});
+  reports.streamOverloaded(kStream, {.time = kBegin, .frames = 512, .cycle = 2, .xruns = 1});
+  leave();
+  EXPECT_THAT(overloads(), ElementsAre("cycle 1: 1", "cycle 2: 1"));
+  EXPECT_EQ(sink.only().messages.back().type, 2U);
+}
+
+TEST_F(StreamReporterTest, KeepsAnOverloadUntilTheSessionHasBegun) {
+  state.described = false;
+  tell();
+  reports.streamOverloaded(kStream, {.time = kBegin, .frames = 512, .cycle = 1, .xruns = 1});
+  EXPECT_THAT(sink.sessions, IsEmpty());
+  clock.advance(1.0);
+  EXPECT_THAT(overloads(), ElementsAre("cycle 1: 1"));
+}
+
+TEST_F(StreamReporterTest, TellsADaemonThatLostTheOldSessionNothingOfItsOverloads) {
+  play();
+  reports.streamOverloaded(kStream, {.time = kBegin, .frames = 512, .cycle = 1, .xruns = 1});
+  reports.streamOverloaded(kStream, {.time = kBegin, .frames = 512, .cycle = 2, .xruns = 1});
+  reports.restartAll();
+  clock.advance(2.0);
+  EXPECT_THAT(overloads(1), IsEmpty());
+}
+
+TEST_F(StreamReporterTest, IgnoresOverloadsOfWhatIsNoStream) {
+  play();
+  reports.streamOverloaded(kStream + 1, {.time = kBegin, .frames = 512, .cycle = 1, .xruns = 1});
+  leave();
+  reports.streamOverloaded(kStream, {.time = kBegin, .frames = 512, .cycle = 1, .xruns = 1});
+  EXPECT_THAT(overloads(), IsEmpty());
+  EXPECT_THAT(sink.sessions, SizeIs(1));
 }
 
 TEST_F(StreamReporterTest, GivesEachStreamASessionOfItsOwn) {
