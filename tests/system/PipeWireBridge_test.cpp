@@ -9,6 +9,7 @@
 #include <signal.h>
 #include <sqlite3.h>
 #include <thread>
+#include <unistd.h>
 #include <vector>
 
 #include "support/TemporaryDirectory.h"
@@ -90,6 +91,23 @@ class PipeWireBridgeTest : public ::testing::Test {
   }
   static void listenFor(milliseconds time) { std::this_thread::sleep_for(time); }
 
+  std::string channelFile() const {
+    return daemon.path(DaemonProcess::kRuntime, "channels/tw-pipewire-" + std::to_string(getuid()) + ".json");
+  }
+  // What the bridge has published of the speaker; an empty object when it has not.
+  nlohmann::json channelOfSpeaker(const std::string& name) const {
+    const nlohmann::json content = nlohmann::json::parse(textOfFile(channelFile()), nullptr, false);
+    if (!content.is_object()) return nlohmann::json::object();
+    for (const nlohmann::json& channel : content.at("channels")) {
+      if (channel.at("group") == "Tx" && channel.value("subgroup", "") == "speaker" &&
+          channel.at("name") == name) {
+        return channel;
+      }
+    }
+    return nlohmann::json::object();
+  }
+  std::int64_t counted(const std::string& name) const { return channelOfSpeaker(name).value("value", -1); }
+
   std::vector<nlohmann::json> summaries() const { return eventsOf(daemon.storePath(), kSummary); }
 
   std::vector<std::filesystem::path> summaryFiles() const {
@@ -167,6 +185,49 @@ TEST_F(PipeWireBridgeTest, EndsTheSessionsOfWhatStillPlaysWhenItIsStopped) {
       eventsOf(daemon.storePath(), "com.orvane.longformaudio.Output.Stop");
   ASSERT_THAT(ends, SizeIs(1));
   EXPECT_GT(ends[0].at("session_duration").get<double>(), 1.0);
+}
+
+TEST_F(PipeWireBridgeTest, PublishesWhatTheGraphsDriversDo) {
+  ASSERT_TRUE(waitUntil([&] { return counted("Cycles") == 0; }));
+  play();
+  ASSERT_TRUE(waitUntil([&] { return counted("Cycles") > 20; }));
+  const nlohmann::json period = channelOfSpeaker("Period");
+  EXPECT_EQ(period.at("unit"), "us");
+  EXPECT_GT(period.at("min"), 0);
+  std::int64_t hits = 0;
+  const nlohmann::json processing = channelOfSpeaker("Processing Time");
+  for (const nlohmann::json& bucket : processing.at("buckets")) {
+    hits += bucket.at("hits").get<std::int64_t>();
+  }
+  EXPECT_GT(hits, 0);
+
+  bridge.signal(SIGTERM);
+  EXPECT_EQ(bridge.wait(), 0);
+  EXPECT_FALSE(std::filesystem::exists(channelFile()));
+}
+
+TEST_F(PipeWireBridgeTest, ReportsOverloadsOfAStreamThatHangs) {
+  play();
+  ASSERT_TRUE(waitUntil([&] { return counted("Cycles") > 20; }));
+  // Its driver goes on without it.
+  player.signal(SIGSTOP);
+  const std::int64_t before = counted("Incomplete Cycles");
+  ASSERT_TRUE(waitUntil([&] { return counted("Incomplete Cycles") > before; }));
+  player.signal(SIGCONT);
+
+  const std::string name = "com.orvane.longformaudio.IO.Error";
+  ASSERT_TRUE(waitUntil([&] { return !eventsOf(daemon.storePath(), name).empty(); }));
+  const nlohmann::json overload = eventsOf(daemon.storePath(), name).front();
+  EXPECT_EQ(overload.at("issue_type"), "overload");
+  EXPECT_EQ(overload.at("HostApplicationDisplayID"), "pw-cat");
+  EXPECT_GT(overload.at("smallest_buffer_frame_size"), 0);
+  EXPECT_GT(overload.at("io_cycle"), 0);
+  EXPECT_GT(overload.at("xrun_count"), 0);
+  stopPlaying();
+
+  const std::string summary = "com.orvane.longformaudio.Session_Generic.Summary";
+  ASSERT_TRUE(waitUntil([&] { return !eventsOf(daemon.storePath(), summary).empty(); }));
+  EXPECT_GT(eventsOf(daemon.storePath(), summary).front().at("overload_count"), 0);
 }
 
 TEST_F(PipeWireBridgeTest, FollowsPipeWireAndTheDaemonThroughTheirRestarts) {

@@ -18,6 +18,13 @@ std::optional<std::uint32_t> identifierOf(std::string_view text) {
   return value;
 }
 
+std::optional<DriverNode> driverOf(const Properties& node) {
+  if (!isDriver(node) || !(isSink(node) || isSource(node))) return std::nullopt;
+  const std::string_view name = propertyOf(node, kNodeNameKey);
+  return DriverNode{isSink(node) ? DriverNode::kSink : DriverNode::kSource,
+                    name.empty() ? deviceNameOf(node) : cleanText(name)};
+}
+
 void mergeInto(Properties& properties, const Properties& update) {
   for (const auto& [key, value] : update) properties[key] = value;
 }
@@ -27,6 +34,7 @@ void mergeInto(Properties& properties, const Properties& update) {
 void GraphModel::nodeAppeared(std::uint32_t node, const Properties& properties) {
   mergeInto(nodes_[node].properties, properties);
   tellAll();
+  tellDrivers(nodes_[node].properties);
 }
 
 void GraphModel::nodeDescribed(std::uint32_t node, bool running, const Properties& properties) {
@@ -37,6 +45,7 @@ void GraphModel::nodeDescribed(std::uint32_t node, bool running, const Propertie
   known->second.running = running;
   // All, because a sink's name is part of the state of whatever plays to it.
   tellAll();
+  tellDrivers(known->second.properties);
 }
 
 void GraphModel::volumeChanged(std::uint32_t node, const StreamVolume& update) {
@@ -63,6 +72,11 @@ void GraphModel::linkAppeared(std::uint32_t link, std::uint32_t outputNode, std:
   tell(outputNode);
 }
 
+void GraphModel::complete() {
+  isComplete_ = true;
+  tellAll();
+}
+
 void GraphModel::removed(std::uint32_t object) {
   clients_.erase(object);
   if (const auto link = links_.find(object); link != links_.end()) {
@@ -73,18 +87,37 @@ void GraphModel::removed(std::uint32_t object) {
   const auto node = nodes_.find(object);
   if (node == nodes_.end()) return;
   const bool wasTold = node->second.told.has_value();
+  const Properties properties = std::move(node->second.properties);
   nodes_.erase(node);
   if (wasTold) observer_.streamGone(object);
   tellAll();
+  tellDrivers(properties);
 }
 
 void GraphModel::clear() {
   const std::map<std::uint32_t, Node> nodes = std::exchange(nodes_, {});
   clients_.clear();
   links_.clear();
+  isComplete_ = false;
   for (const auto& [identifier, node] : nodes) {
     if (node.told) observer_.streamGone(identifier);
   }
+  onDriversChanged_();
+}
+
+std::map<std::uint32_t, DriverNode> GraphModel::drivers() const {
+  std::map<std::uint32_t, DriverNode> drivers;
+  for (const auto& [identifier, node] : nodes_) {
+    if (std::optional<DriverNode> driver = driverOf(node.properties)) {
+      drivers.emplace(identifier, *std::move(driver));
+    }
+  }
+  return drivers;
+}
+
+std::optional<DriverNode> GraphModel::driverAt(std::uint32_t node) const {
+  const auto found = nodes_.find(node);
+  return found == nodes_.end() ? std::nullopt : driverOf(found->second.properties);
 }
 
 const Properties* GraphModel::clientOf(const Node& node) const {
@@ -123,6 +156,7 @@ StreamState GraphModel::stateOf(std::uint32_t stream, const Node& node) const {
 }
 
 void GraphModel::tell(std::uint32_t stream) {
+  if (!isComplete_) return;
   const auto found = nodes_.find(stream);
   if (found == nodes_.end() || !isOutputStream(found->second.properties)) return;
   Node& node = found->second;
@@ -134,6 +168,10 @@ void GraphModel::tell(std::uint32_t stream) {
 
 void GraphModel::tellAll() {
   for (const auto& [identifier, node] : nodes_) tell(identifier);
+}
+
+void GraphModel::tellDrivers(const Properties& node) {
+  if (driverOf(node)) onDriversChanged_();
 }
 
 }  // namespace tonewerk

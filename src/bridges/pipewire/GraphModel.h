@@ -2,9 +2,11 @@
 #pragma once
 
 #include <cstdint>
+#include <functional>
 #include <map>
 #include <optional>
 
+#include "bridges/pipewire/DriverNode.h"
 #include "bridges/pipewire/StreamDescription.h"
 #include "bridges/pipewire/StreamState.h"
 #include "bridges/pipewire/StreamVolume.h"
@@ -21,7 +23,10 @@ class StreamObserver {
 };
 
 // The part of a sound graph that matters here, put together from what its objects say one by one, in any
-// order: streams, the clients they belong to, the sinks they are linked to.
+// order: streams, the clients they belong to, the sinks they are linked to, and which sinks and sources drive
+// the others.
+//
+// While a graph is first described nobody hears of its streams: what a stream plays to may be told after it.
 //
 // For one thread. Holds as much as the graph does: what is said of a node that has not appeared, or has left,
 // is ignored.
@@ -38,10 +43,19 @@ class GraphModel {
   void formatChanged(std::uint32_t node, const AudioFormat& format);
   void clientDescribed(std::uint32_t client, const Properties& properties);
   void linkAppeared(std::uint32_t link, std::uint32_t outputNode, std::uint32_t inputNode);
+  // Everything that was in the graph has been told.
+  void complete();
   // An object of any kind, known or not, has left the graph.
   void removed(std::uint32_t object);
   // The graph itself is gone.
   void clear();
+
+  // The sinks and sources that drive others, by node.
+  std::map<std::uint32_t, DriverNode> drivers() const;
+  // None when the node is no such driver.
+  std::optional<DriverNode> driverAt(std::uint32_t node) const;
+  // Runs `onChange` whenever drivers() may differ, from inside the functions above.
+  void watchDrivers(std::function<void()> onChange) { onDriversChanged_ = std::move(onChange); }
 
  private:
   struct Node {
@@ -62,8 +76,11 @@ class GraphModel {
   StreamState stateOf(std::uint32_t stream, const Node& node) const;
   void tell(std::uint32_t stream);
   void tellAll();
+  void tellDrivers(const Properties& node);
 
   StreamObserver& observer_;
+  std::function<void()> onDriversChanged_ = [] {};
+  bool isComplete_ = false;
   std::map<std::uint32_t, Node> nodes_;
   std::map<std::uint32_t, Properties> clients_;
   std::map<std::uint32_t, Link> links_;

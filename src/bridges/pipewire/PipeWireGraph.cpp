@@ -6,11 +6,14 @@
 #include <cstring>
 #include <functional>
 #include <map>
+#include <pipewire/extensions/profiler.h>
 #include <pipewire/pipewire.h>
+#include <set>
 #include <string>
 #include <utility>
 
 #include "bridges/pipewire/PipeWireParams.h"
+#include "bridges/pipewire/PipeWireProfiler.h"
 
 namespace tonewerk {
 
@@ -129,12 +132,16 @@ class PipeWireGraph::Connection {
   Connection(PipeWireGraph& graph, pw_core* core)
       : graph_(graph), core_(core), registry_(pw_core_get_registry(core, PW_VERSION_REGISTRY, 0)) {
     listenToCore();
-    if (registry_ != nullptr) listenToRegistry();
+    if (registry_ == nullptr) return;
+    profiler_ = std::make_unique<PipeWireProfiler>(registry_, graph_.profiles_);
+    listenToRegistry();
+    sync_ = pw_core_sync(core_, PW_ID_CORE, 0);
   }
   Connection(const Connection&) = delete;
   Connection& operator=(const Connection&) = delete;
   ~Connection() {
     bound_.clear();
+    profiler_.reset();
     if (registry_ != nullptr) {
       spa_hook_remove(&registryListener_);
       pw_proxy_destroy(reinterpret_cast<pw_proxy*>(registry_));
@@ -150,6 +157,9 @@ class PipeWireGraph::Connection {
       events.version = PW_VERSION_CORE_EVENTS;
       events.info = [](void* self, const pw_core_info*) {
         static_cast<Connection*>(self)->graph_.established();
+      };
+      events.done = [](void* self, std::uint32_t object, int sequence) {
+        if (object == PW_ID_CORE) static_cast<Connection*>(self)->onDone(sequence);
       };
       events.error = [](void* self, std::uint32_t object, int, int result, const char* message) {
         static_cast<Connection*>(self)->onError(object, result, message);
@@ -175,6 +185,18 @@ class PipeWireGraph::Connection {
     pw_registry_add_listener(registry_, &registryListener_, &kEvents, this);
   }
 
+  // The first answer comes after all objects have appeared, and everything about them has been asked; the
+  // second after that has been told.
+  void onDone(int sequence) {
+    if (sequence != sync_) return;
+    if (std::exchange(hasListed_, true)) {
+      sync_ = -1;
+      graph_.model_.complete();
+    } else {
+      sync_ = pw_core_sync(core_, PW_ID_CORE, 0);
+    }
+  }
+
   void onError(std::uint32_t object, int result, const char* message) {
     // Errors of other objects are races with their removal.
     if (object == PW_ID_CORE && result == -EPIPE) {
@@ -190,6 +212,7 @@ class PipeWireGraph::Connection {
       bind<BoundClient>(identifier, PW_TYPE_INTERFACE_Client, PW_VERSION_CLIENT);
       return;
     }
+    if (type == PW_TYPE_INTERFACE_Profiler) return profiler_->appeared(identifier);
     if (type != PW_TYPE_INTERFACE_Link) return;
     const std::optional<std::uint32_t> output = numberOf(dictionary, kLinkOutputNodeKey);
     const std::optional<std::uint32_t> input = numberOf(dictionary, kLinkInputNodeKey);
@@ -197,7 +220,11 @@ class PipeWireGraph::Connection {
   }
 
   void onNode(std::uint32_t identifier, const Properties& properties) {
-    if (!isOutputStream(properties) && !isSink(properties)) return;
+    if (isStream(properties)) {
+      streams_.insert(identifier);
+      profiler_->setWanted(true);
+    }
+    if (!isOutputStream(properties) && !isSink(properties) && !isSource(properties)) return;
     graph_.model_.nodeAppeared(identifier, properties);
     bind<BoundNode>(identifier, PW_TYPE_INTERFACE_Node, PW_VERSION_NODE);
   }
@@ -211,6 +238,9 @@ class PipeWireGraph::Connection {
 
   void onRemoved(std::uint32_t identifier) {
     bound_.erase(identifier);
+    profiler_->removed(identifier);
+    streams_.erase(identifier);
+    profiler_->setWanted(!streams_.empty());
     graph_.model_.removed(identifier);
   }
 
@@ -218,13 +248,19 @@ class PipeWireGraph::Connection {
   pw_core* core_;
   pw_registry* registry_;
   bool broken_ = false;
+  int sync_ = -1;  // the question that is open
+  bool hasListed_ = false;
   spa_hook coreListener_{};
   spa_hook registryListener_{};
   std::map<std::uint32_t, std::unique_ptr<BoundObject>> bound_;
+  std::set<std::uint32_t> streams_;  // of sound, playing or recording
+  std::unique_ptr<PipeWireProfiler> profiler_;
 };
 
-PipeWireGraph::PipeWireGraph(PipeWireLoop& loop, GraphModel& model, const Diagnostics& diagnostics)
+PipeWireGraph::PipeWireGraph(PipeWireLoop& loop, GraphModel& model, ProfileObserver& profiles,
+                             const Diagnostics& diagnostics)
     : model_(model),
+      profiles_(profiles),
       diagnostics_(diagnostics),
       loop_(loop),
       retryTimer_(loop.makeTimer([this] { retryNow(); })) {}
@@ -237,6 +273,9 @@ PipeWireGraph::~PipeWireGraph() {
 bool PipeWireGraph::open() {
   context_ = pw_context_new(loop_.native(), nullptr, 0);
   if (context_ == nullptr) return false;
+  if (!PipeWireProfiler::teach(context_)) {
+    diagnostics_.say("cannot use PipeWire's profiler: no statistics of drivers, no overloads");
+  }
   connect();
   return true;
 }

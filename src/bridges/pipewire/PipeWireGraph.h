@@ -6,21 +6,23 @@
 #include "bridges/pipewire/Diagnostics.h"
 #include "bridges/pipewire/GraphModel.h"
 #include "bridges/pipewire/PipeWireLoop.h"
+#include "bridges/pipewire/ProfileObserver.h"
 #include "bridges/pipewire/RetryDelay.h"
 
 struct pw_context;
 
 namespace tonewerk {
 
-// Tells a GraphModel what is in the graph of the PipeWire daemon, and clears it when that daemon goes away. A
-// daemon that is not there, or no longer, is tried again until it is. It only looks: it adds nothing to the
-// graph.
+// Tells a GraphModel what is in the graph of the PipeWire daemon, and clears it when that daemon goes away;
+// tells a ProfileObserver how its drivers do, as long as there are streams of sound. A daemon that is not
+// there, or no longer, is tried again until it is. It only looks: it adds nothing to the graph.
 //
 // For the loop's thread.
 class PipeWireGraph {
  public:
   // All outlive this.
-  PipeWireGraph(PipeWireLoop& loop, GraphModel& model, const Diagnostics& diagnostics);
+  PipeWireGraph(PipeWireLoop& loop, GraphModel& model, ProfileObserver& profiles,
+                const Diagnostics& diagnostics);
   PipeWireGraph(const PipeWireGraph&) = delete;
   PipeWireGraph& operator=(const PipeWireGraph&) = delete;
   ~PipeWireGraph();
@@ -37,6 +39,7 @@ class PipeWireGraph {
   void retryNow();
 
   GraphModel& model_;
+  ProfileObserver& profiles_;
   const Diagnostics& diagnostics_;
   PipeWireLoop& loop_;
   pw_context* context_ = nullptr;

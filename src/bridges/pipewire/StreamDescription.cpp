@@ -15,10 +15,21 @@ bool isOutputStream(const Properties& node) {
   return propertyOf(node, kMediaClassKey) == "Stream/Output/Audio";
 }
 
+bool isStream(const Properties& node) {
+  return isOutputStream(node) || propertyOf(node, kMediaClassKey) == "Stream/Input/Audio";
+}
+
 bool isSink(const Properties& node) {
   // "Audio/Sink/Virtual" and the like too; a duplex device is a sink to what plays into it.
   const std::string_view mediaClass = propertyOf(node, kMediaClassKey);
   return mediaClass.starts_with("Audio/Sink") || mediaClass.starts_with("Audio/Duplex");
+}
+
+bool isSource(const Properties& node) { return propertyOf(node, kMediaClassKey).starts_with("Audio/Source"); }
+
+bool isDriver(const Properties& node) {
+  const std::string_view driver = propertyOf(node, kNodeDriverKey);
+  return driver == "true" || driver == "1";
 }
 
 std::string deviceNameOf(const Properties& sink) {

@@ -3,11 +3,14 @@
 #include <CLI/CLI.hpp>
 #include <csignal>
 #include <cstdio>
+#include <filesystem>
 #include <pipewire/pipewire.h>
 #include <unistd.h>
 
 #include "bridges/pipewire/DaemonLink.h"
+#include "bridges/pipewire/DriverReports.h"
 #include "bridges/pipewire/PipeWireGraph.h"
+#include "bridges/pipewire/PublishingSessionSink.h"
 #include "bridges/pipewire/StreamReports.h"
 #include "platform/linux/SystemClock.h"
 
@@ -32,11 +35,21 @@ int runBridge(const Diagnostics& diagnostics) {
   const SystemClock clock;
   ReporterIdentifiers identifiers(clock, getpid());
   DaemonLink daemon(*loop, diagnostics, ReportingClient::socketPaths());
-  StreamReports reports(daemon, clock, identifiers, *loop);
+  // Users of one daemon publish beside each other.
+  const std::string user = std::to_string(getuid());
+  DriverStatistics statistics;
+  ChannelPublisher publisher(*loop, clock, diagnostics, "tw-pipewire-" + user + ".json",
+                             [&] { return statistics.channelsOf("PipeWire<" + user + ">"); });
+  PublishingSessionSink sessions(daemon, publisher);
+  StreamReports reports(sessions, clock, identifiers, *loop);
   GraphModel model(reports);
+  DriverReports drivers(model, statistics, reports, publisher, clock);
   {
-    PipeWireGraph graph(*loop, model, diagnostics);
-    daemon.open([&reports] { reports.restartAll(); });
+    PipeWireGraph graph(*loop, model, drivers, diagnostics);
+    daemon.open([&] {
+      publisher.open(std::filesystem::path(daemon.socketPath()).parent_path());
+      reports.restartAll();
+    });
     if (!graph.open()) {
       diagnostics.say("cannot use PipeWire: its client configuration is missing or broken");
       return 1;
@@ -46,6 +59,8 @@ int runBridge(const Diagnostics& diagnostics) {
   // Streams that still play are no longer watched: their sessions end here.
   model.clear();
   if (daemon.isConnected() && !daemon.finish(kLastWords)) diagnostics.say("the daemon took not everything");
+  // Not before: the daemon reads them when a session stops.
+  publisher.withdraw();
   return 0;
 }
 

@@ -11,6 +11,7 @@ namespace {
 
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
+using ::testing::Pair;
 
 class Observer final : public StreamObserver {
  public:
@@ -36,6 +37,8 @@ Properties properties(std::initializer_list<std::pair<std::string_view, const ch
 
 class GraphModelTest : public ::testing::Test {
  protected:
+  GraphModelTest() { model.complete(); }
+
   static constexpr std::uint32_t kStream = 40;
   static constexpr std::uint32_t kClient = 30;
   static constexpr std::uint32_t kSpeaker = 50;
@@ -65,6 +68,7 @@ TEST_F(GraphModelTest, TellsOfOutputStreamsOnly) {
 TEST_F(GraphModelTest, KnowsWhoPlaysWhenNodeAndClientHaveSpokenInEitherOrder) {
   for (const bool clientFirst : {true, false}) {
     model.clear();
+    model.complete();
     addStream();
     if (clientFirst) model.clientDescribed(kClient, properties({{kApplicationBinaryKey, "player"}}));
     EXPECT_FALSE(stream().described);
@@ -168,6 +172,69 @@ TEST_F(GraphModelTest, EndsEveryStreamWhenTheGraphGoes) {
   EXPECT_THAT(observer.states, IsEmpty());
 }
 
+// What plays when the bridge comes may be listed before its device: the first message once lacked it.
+TEST_F(GraphModelTest, TellsOfNoStreamUntilTheGraphHasBeenDescribed) {
+  model.clear();
+  addStream();
+  model.nodeDescribed(kStream, true, {});
+  addSink(kSpeaker, "Speaker");
+  model.linkAppeared(70, kStream, kSpeaker);
+  EXPECT_EQ(observer.changes, 0);
+  model.complete();
+  EXPECT_EQ(observer.changes, 1);
+  EXPECT_EQ(stream().device, "Speaker");
+}
+
+TEST_F(GraphModelTest, TellsOfNoStreamThatLeftBeforeTheGraphWasDescribed) {
+  model.clear();
+  addStream();
+  model.removed(kStream);
+  model.complete();
+  EXPECT_THAT(observer.states, IsEmpty());
+  EXPECT_THAT(observer.gone, IsEmpty());
+}
+
+TEST_F(GraphModelTest, KnowsTheSinksAndSourcesThatDriveOthers) {
+  const auto add = [&](std::uint32_t node, const char* mediaClass, const char* driver) {
+    const std::string name = "node-" + std::to_string(node);
+    model.nodeAppeared(node, properties({{kMediaClassKey, mediaClass}, {kNodeNameKey, name.c_str()}}));
+    model.nodeDescribed(node, true, properties({{kNodeDriverKey, driver}}));
+  };
+  add(1, "Audio/Sink", "true");
+  add(2, "Audio/Source", "1");
+  add(3, "Audio/Duplex", "true");
+  add(4, "Audio/Source/Virtual", "true");
+  add(5, "Audio/Sink", "false");
+  add(6, "Stream/Output/Audio", "true");
+  model.nodeAppeared(7, properties({{kNodeNameKey, "Dummy-Driver"}, {kNodeDriverKey, "true"}}));
+  EXPECT_THAT(model.drivers(), ElementsAre(Pair(1, DriverNode{DriverNode::kSink, "node-1"}),
+                                           Pair(2, DriverNode{DriverNode::kSource, "node-2"}),
+                                           Pair(3, DriverNode{DriverNode::kSink, "node-3"}),
+                                           Pair(4, DriverNode{DriverNode::kSource, "node-4"})));
+  EXPECT_EQ(model.driverAt(1), (DriverNode{DriverNode::kSink, "node-1"}));
+  EXPECT_EQ(model.driverAt(5), std::nullopt);
+  EXPECT_EQ(model.driverAt(99), std::nullopt);
+}
+
+TEST_F(GraphModelTest, SaysWhenItsDriversMayDiffer) {
+  int changes = 0;
+  model.watchDrivers([&] { ++changes; });
+  addStream();
+  addSink(kSpeaker, "Speaker");
+  EXPECT_EQ(changes, 0);
+  model.nodeDescribed(kSpeaker, true, properties({{kNodeDriverKey, "true"}}));
+  EXPECT_EQ(changes, 1);
+  // Without a name of its own it goes by what people call it.
+  EXPECT_EQ(model.driverAt(kSpeaker)->name, "Speaker");
+  model.removed(kStream);
+  EXPECT_EQ(changes, 1);
+  model.removed(kSpeaker);
+  EXPECT_EQ(changes, 2);
+  EXPECT_THAT(model.drivers(), IsEmpty());
+  model.clear();
+  EXPECT_EQ(changes, 3);
+}
+
 TEST_F(GraphModelTest, ShortensWhatTheGraphSays) {
   addStream();
   const std::string endless(1'000'000, 'x');
@@ -177,6 +244,9 @@ TEST_F(GraphModelTest, ShortensWhatTheGraphSays) {
   model.linkAppeared(70, kStream, kSpeaker);
   EXPECT_LE(stream().application.size(), 256U);
   EXPECT_LE(stream().device.size(), 256U);
+  model.nodeDescribed(kSpeaker, true,
+                      {{std::string(kNodeNameKey), endless}, {std::string(kNodeDriverKey), "true"}});
+  EXPECT_EQ(model.driverAt(kSpeaker)->name.size(), 256U);
 }
 
 }  // namespace

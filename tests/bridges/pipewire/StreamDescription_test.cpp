@@ -75,6 +75,22 @@ TEST(StreamDescription, KnowsStreamsAndSinksByMediaClass) {
   EXPECT_TRUE(isSink(of("Audio/Duplex")));
   EXPECT_FALSE(isSink(of("Audio/Source")));
   EXPECT_FALSE(isSink({}));
+  EXPECT_TRUE(isStream(of("Stream/Output/Audio")));
+  EXPECT_TRUE(isStream(of("Stream/Input/Audio")));
+  EXPECT_FALSE(isStream(of("Stream/Input/Video")));
+  EXPECT_FALSE(isStream(of("Audio/Sink")));
+  EXPECT_TRUE(isSource(of("Audio/Source")));
+  EXPECT_TRUE(isSource(of("Audio/Source/Virtual")));
+  EXPECT_FALSE(isSource(of("Audio/Duplex")));
+  EXPECT_FALSE(isSource({}));
+}
+
+TEST(StreamDescription, KnowsADriverByWhatItSays) {
+  const std::string driver(kNodeDriverKey);
+  EXPECT_TRUE(isDriver({{driver, "true"}}));
+  EXPECT_TRUE(isDriver({{driver, "1"}}));
+  EXPECT_FALSE(isDriver({{driver, "false"}}));
+  EXPECT_FALSE(isDriver({}));
 }
 
 TEST(AudioFormat, ReadsAsSampleFormatRateAndChannels) {
