@@ -58,6 +58,7 @@ class RunningClock final : public Clock {
     return std::chrono::steady_clock::now().time_since_epoch();
   }
   std::chrono::minutes utcOffset(double) const override { return {}; }
+  void sleep(std::chrono::nanoseconds) override {}
 };
 
 class CountingMetricon final : public Metricon {

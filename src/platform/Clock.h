@@ -5,7 +5,7 @@
 
 namespace tonewerk {
 
-// What time it is. Any thread.
+// What time it is, and letting it pass. Any thread.
 class Clock {
  public:
   virtual ~Clock() = default;
@@ -18,6 +18,9 @@ class Clock {
 
   // What the device's time zone adds to UTC at the given wall-clock time.
   virtual std::chrono::minutes utcOffset(double at) const = 0;
+
+  // Blocks the calling thread until so much monotonic time has passed; not at all for 0 or less.
+  virtual void sleep(std::chrono::nanoseconds duration) = 0;
 };
 
 }  // namespace tonewerk

@@ -11,6 +11,7 @@ using AudioEventCategory = std::uint32_t;
 
 inline constexpr AudioEventCategory kCategoryGeneric = 1;
 inline constexpr AudioEventCategory kCategoryInput = 3;
+inline constexpr AudioEventCategory kCategoryIo = 7;
 inline constexpr AudioEventCategory kCategorySetup = 8;
 inline constexpr AudioEventCategory kCategoryError = 11;
 inline constexpr AudioEventCategory kCategoryChanmetering = 12;
@@ -32,6 +33,7 @@ inline constexpr AudioEventType kTypeSummary = 11;
 inline constexpr AudioEventType kTypeSimple = 16;
 inline constexpr AudioEventType kTypeHistogram = 17;
 inline constexpr AudioEventType kTypeState = 18;
+inline constexpr AudioEventType kTypeMemoryLog = 19;
 inline constexpr AudioEventType kTypeUnknown = 65535;
 
 // What a session reports for: 0 to 13, or unknown.

@@ -7,6 +7,7 @@
 #include "workers/producers/TWReportingSessionGatherMessagesWorker.h"
 #include "workers/producers/TWReportingSessionInputMessagesWorker.h"
 #include "workers/producers/TWReportingSessionVolumeMessagesWorker.h"
+#include "workers/sinks/TWReportingSessionDPWorker.h"
 #include "workers/sinks/TWReportingSessionDiagwireWorker.h"
 #include "workers/sinks/TWReportingSessionEnergybookWorker.h"
 #include "workers/sinks/TWReportingSessionMetriconWorker.h"
@@ -30,6 +31,7 @@ std::vector<const TWReportingSessionWorkerClass*> allWorkerClasses() {
       &TWReportingSessionDiagwireWorker::kWorkerClass,
       &TWReportingSessionDriverSnapshotWorker::kWorkerClass,
       &TWReportingSessionCapsaWorker::kWorkerClass,
+      &TWReportingSessionDPWorker::kWorkerClass,
       &TWReportingSessionSummaryJsonFileWorker::kWorkerClass,
       &TWReportingSessionRtcWorker::kWorkerClass,
   };

@@ -490,7 +490,8 @@ TEST_F(WorkerTest, TheDaemonsClassesComeInTheRegistrysOrder) {
                           "TWReportingSessionInputMessagesWorker", "TWReportingSessionMetriconWorker",
                           "TWReportingSessionEnergybookWorker", "TWReportingSessionDiagwireWorker",
                           "TWReportingSessionDriverSnapshotWorker", "TWReportingSessionCapsaWorker",
-                          "TWReportingSessionSummaryJsonFileWorker", "TWReportingSessionRtcWorker"));
+                          "TWReportingSessionDPWorker", "TWReportingSessionSummaryJsonFileWorker",
+                          "TWReportingSessionRtcWorker"));
 }
 
 TEST_F(WorkerTest, TheRegistryIsFilledOnce) {

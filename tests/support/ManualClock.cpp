@@ -29,6 +29,10 @@ std::chrono::minutes ManualClock::utcOffset(double) const {
   return utcOffset_;
 }
 
+void ManualClock::sleep(std::chrono::nanoseconds duration) {
+  if (duration.count() > 0) advance(duration);
+}
+
 void ManualClock::advance(std::chrono::nanoseconds duration) {
   advanceUntil(duration, [] { return false; });
 }

@@ -38,6 +38,8 @@ class ManualClock final : public Clock {
   double now() const override;
   std::chrono::nanoseconds monotonic() const override;
   std::chrono::minutes utcOffset(double at) const override;
+  // Moves both times forward, as advance() does: whoever sleeps on this clock is who moves it.
+  void sleep(std::chrono::nanoseconds duration) override;
 
   // Moves both times forward. What is due on the way runs in order, each at its own time.
   void advance(std::chrono::nanoseconds duration);

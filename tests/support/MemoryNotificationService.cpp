@@ -35,6 +35,7 @@ std::error_code MemoryNotificationService::post(std::string_view name) {
   if (!NotificationHandlers::isName(name)) return std::make_error_code(std::errc::invalid_argument);
   {
     const std::lock_guard lock(mutex_);
+    if (postFailure_ != std::errc()) return std::make_error_code(postFailure_);
     states_.try_emplace(std::string(name), 0);
   }
   handlers_.tell(name);
@@ -55,6 +56,11 @@ std::error_code MemoryNotificationService::post(std::string_view name, std::uint
 void MemoryNotificationService::makeUnreadable(std::string_view name) {
   const std::lock_guard lock(mutex_);
   unreadable_.emplace(name);
+}
+
+void MemoryNotificationService::failPosts(std::errc error) {
+  const std::lock_guard lock(mutex_);
+  postFailure_ = error;
 }
 
 void MemoryNotificationService::failRegistrations(std::uint32_t status) {

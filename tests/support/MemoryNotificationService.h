@@ -9,6 +9,7 @@
 #include <set>
 #include <string>
 #include <string_view>
+#include <system_error>
 #include <vector>
 
 #include "platform/NotificationHandlers.h"
@@ -36,6 +37,8 @@ class MemoryNotificationService final : public NotificationService {
   void makeUnreadable(std::string_view name);
   // kStatusOk makes registrations succeed again.
   void failRegistrations(std::uint32_t status);
+  // std::errc() makes posts succeed again.
+  void failPosts(std::errc error);
 
   // The names registered now, in the order of their registrations.
   std::vector<std::string> registered() const;
@@ -47,6 +50,7 @@ class MemoryNotificationService final : public NotificationService {
   std::set<std::string, std::less<>> unreadable_;
   std::map<Token, std::string> registered_;
   std::uint32_t failure_ = kStatusOk;
+  std::errc postFailure_{};
 };
 
 }  // namespace tonewerk

@@ -3,6 +3,7 @@
 
 #include <cmath>
 #include <ctime>
+#include <thread>
 
 namespace tonewerk {
 namespace {
@@ -33,6 +34,10 @@ std::chrono::minutes SystemClock::utcOffset(double at) const {
   tzset();  // localtime_r() need not look for a changed time zone
   if (localtime_r(&seconds, &local) == nullptr) return std::chrono::minutes(0);
   return std::chrono::duration_cast<std::chrono::minutes>(std::chrono::seconds(local.tm_gmtoff));
+}
+
+void SystemClock::sleep(std::chrono::nanoseconds duration) {
+  if (duration.count() > 0) std::this_thread::sleep_for(duration);
 }
 
 }  // namespace tonewerk

@@ -12,6 +12,7 @@ class SystemClock final : public Clock {
   std::chrono::nanoseconds monotonic() const override;
   // 0 for a time that no calendar reaches.
   std::chrono::minutes utcOffset(double at) const override;
+  void sleep(std::chrono::nanoseconds duration) override;
 };
 
 }  // namespace tonewerk

@@ -70,5 +70,14 @@ TEST(SystemClockTest, ATimeBeyondAllCalendarsHasNoOffset) {
   EXPECT_EQ(clock.utcOffset(-1e16), minutes(0));
 }
 
+TEST(SystemClockTest, ASleepLastsAsLongAsItSays) {
+  SystemClock clock;
+  const auto before = clock.monotonic();
+  clock.sleep(std::chrono::milliseconds(20));
+  EXPECT_GE(clock.monotonic() - before, std::chrono::milliseconds(20));
+  clock.sleep(std::chrono::nanoseconds(0));
+  clock.sleep(std::chrono::hours(-1));
+}
+
 }  // namespace
 }  // namespace tonewerk

@@ -1,0 +1,133 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "workers/sinks/TWReportingSessionDPWorker.h"
+
+#include <optional>
+
+#include "platform/Clock.h"
+#include "platform/LogLine.h"
+#include "platform/NotificationService.h"
+#include "platform/WhirlcapRequest.h"
+#include "session/TWReportingContext.h"
+#include "session/TWReportingDefaults.h"
+#include "session/TWReportingKeys.h"
+#include "session/TWReportingSession.h"
+#include "session/TWReportingUtility.h"
+#include "workers/sinks/TWReportingDPSettings.h"
+
+namespace tonewerk {
+namespace {
+
+constexpr std::string_view kEnableWhirlcap = "enable_whirlcap";
+constexpr std::string_view kIoBufferSize = "io_buffer_size";
+constexpr std::string_view kIoCycle = "io_cycle";
+constexpr std::string_view kWaitTime = "wait_time";
+constexpr std::string_view kSmallestBufferFrameSize = "smallest_buffer_frame_size";
+
+constexpr std::int32_t kDefaultIoBufferSize = 512;
+constexpr double kSecondsBetweenRequests = 10.0;
+constexpr std::string_view kDroppedWhirlcapNotification = "com.orvane.tonewerk.dropped-whirlcap";
+
+TWReportingDPSettings& settings() {
+  return TWReportingContext::current().singles().get<TWReportingDPSettings>();
+}
+
+std::optional<Value> readDefault(std::string_view key) {
+  std::optional<Value> value = TWReportingSessionDPWorker::getUserDefaults().read(key);
+  if (value) debugLog(TWReportingDPLogCategory(), "Value of %@ is %@", key, *value);
+  return value;
+}
+
+// Whole microseconds; none for what is no time.
+std::chrono::microseconds waitTimeOf(double microseconds) {
+  constexpr std::chrono::microseconds kMost = TWReportingSessionDPWorker::kMostWaitTime;
+  if (!(microseconds > 0.0)) return std::chrono::microseconds(0);
+  if (microseconds >= static_cast<double>(kMost.count())) return kMost;
+  return std::chrono::microseconds(static_cast<std::int64_t>(microseconds));
+}
+
+void requestTrace(const TWReportingSessionMessage& message) {
+  const Platform& platform = TWReportingContext::current().platform();
+  platform.clock.sleep(settings().waitTime);
+  ValueMap payload = message.message;  // shares nothing that somebody else can change
+  infoLog(TWReportingDPLogCategory(), "Dropping whirlcap %@", message);
+  platform.whirlcaps.request("com.orvane.tonewerk", "AudioOverloads",
+                             textOf(payload.find(TWReportingApplicationName)), payload,
+                             {.first = true, .second = true});
+  if (const std::error_code error = platform.notifications.post(kDroppedWhirlcapNotification)) {
+    errorLog(TWReportingDPLogCategory(), "cannot post %@: %@", kDroppedWhirlcapNotification, error.message());
+  }
+  infoLog(TWReportingDPLogCategory(), "Dropped whirlcap");
+}
+
+}  // namespace
+
+const TWReportingSessionWorkerClass TWReportingSessionDPWorker::kWorkerClass =
+    workerClassOf<TWReportingSessionDPWorker>("TWReportingSessionDPWorker");
+
+std::shared_ptr<TWReportingSessionDPWorker> TWReportingSessionDPWorker::initWithSession(
+    const std::shared_ptr<TWReportingSession>& session) {
+  const bool isEnabled = getEnableFlag(kEnableWhirlcap);
+  if (!TWReportingUtilityIsInternalBuild() || !isEnabled) return nullptr;
+  auto worker = std::make_shared<TWReportingSessionDPWorker>();
+  worker->session = session;
+  const std::int32_t ioBufferSize = getRunTimeDefaults(kIoBufferSize);
+  settings().ioBufferSize = ioBufferSize == 0 ? kDefaultIoBufferSize : ioBufferSize;
+  settings().ioCycle = getRunTimeDefaults(kIoCycle);
+  settings().waitTime = waitTimeOf(getDoubleRunTimeDefaults(kWaitTime));
+  return worker;
+}
+
+std::optional<bool> TWReportingSessionDPWorker::start() {
+  started = true;
+  return true;
+}
+
+bool TWReportingSessionDPWorker::interestedInMessage(const TWReportingSessionMessage& message) const {
+  if (message.type != kTypeError || message.category != kCategoryIo) return false;
+  infoLog(TWReportingDPLogCategory(), "Interested in overload");
+  return true;
+}
+
+bool TWReportingSessionDPWorker::handleMessage(const TWReportingSessionMessage& message) {
+  const double now = TWReportingContext::current().platform().clock.now();
+  if (meetsConditions(message, now)) {
+    requestTrace(message);
+    lastMessageTime_ = now;
+    return false;
+  }
+  debugLog(TWReportingDPLogCategory(),
+           "Did not drop whirlcap, right conditions not met: buffer size : %d, time diff : %f, io cycle: %d",
+           integerOf(message.message.find(kSmallestBufferFrameSize)), now - lastMessageTime_,
+           integerOf(message.message.find(kIoCycle)));
+  return false;
+}
+
+bool TWReportingSessionDPWorker::meetsConditions(const TWReportingSessionMessage& message, double now) const {
+  if (!interestedInMessage(message)) return false;
+  const Value* bufferSize = message.message.find(kSmallestBufferFrameSize);
+  if ((bufferSize == nullptr ? 0 : bufferSize->integer32()) < settings().ioBufferSize) return false;
+  if (lastMessageTime_ != 0.0 && now - lastMessageTime_ <= kSecondsBetweenRequests) return false;
+  return integerOf(message.message.find(kIoCycle)) >= settings().ioCycle;
+}
+
+const TWReportingDefaults& TWReportingSessionDPWorker::getUserDefaults() {
+  TWReportingContext& context = TWReportingContext::current();
+  return context.singles().get<TWReportingDefaults>(context.platform().preferences);
+}
+
+bool TWReportingSessionDPWorker::getEnableFlag(std::string_view key) {
+  const std::optional<Value> value = readDefault(key);
+  return value && value->boolean();
+}
+
+std::int32_t TWReportingSessionDPWorker::getRunTimeDefaults(std::string_view key) {
+  const std::optional<Value> value = readDefault(key);
+  return value ? value->integer32() : 0;
+}
+
+double TWReportingSessionDPWorker::getDoubleRunTimeDefaults(std::string_view key) {
+  const std::optional<Value> value = readDefault(key);
+  return value ? value->number() : 0.0;
+}
+
+}  // namespace tonewerk
