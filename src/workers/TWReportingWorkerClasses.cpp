@@ -3,6 +3,7 @@
 
 #include "driver/TWReportingSessionDriverSnapshotWorker.h"
 #include "workers/diagnostics/TWReportingSessionCapsaWorker.h"
+#include "workers/diagnostics/TWReportingSessionIssueDraftWorker.h"
 #include "workers/diagnostics/TWReportingSessionTraceWorker.h"
 #include "workers/producers/TWReportingSessionGatherMessagesWorker.h"
 #include "workers/producers/TWReportingSessionInputMessagesWorker.h"
@@ -34,6 +35,7 @@ std::vector<const TWReportingSessionWorkerClass*> allWorkerClasses() {
       &TWReportingSessionDPWorker::kWorkerClass,
       &TWReportingSessionSummaryJsonFileWorker::kWorkerClass,
       &TWReportingSessionRtcWorker::kWorkerClass,
+      &TWReportingSessionIssueDraftWorker::kWorkerClass,
   };
 }
 

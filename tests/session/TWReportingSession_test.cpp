@@ -491,7 +491,7 @@ TEST_F(WorkerTest, TheDaemonsClassesComeInTheRegistrysOrder) {
                           "TWReportingSessionEnergybookWorker", "TWReportingSessionDiagwireWorker",
                           "TWReportingSessionDriverSnapshotWorker", "TWReportingSessionCapsaWorker",
                           "TWReportingSessionDPWorker", "TWReportingSessionSummaryJsonFileWorker",
-                          "TWReportingSessionRtcWorker"));
+                          "TWReportingSessionRtcWorker", "TWReportingSessionIssueDraftWorker"));
 }
 
 TEST_F(WorkerTest, TheRegistryIsFilledOnce) {
