@@ -4,6 +4,7 @@
 #include "driver/TWReportingSessionDriverSnapshotWorker.h"
 #include "workers/diagnostics/TWReportingSessionCapsaWorker.h"
 #include "workers/diagnostics/TWReportingSessionIssueDraftWorker.h"
+#include "workers/diagnostics/TWReportingSessionMemoryLogWorker.h"
 #include "workers/diagnostics/TWReportingSessionTraceWorker.h"
 #include "workers/producers/TWReportingSessionGatherMessagesWorker.h"
 #include "workers/producers/TWReportingSessionInputMessagesWorker.h"
@@ -29,6 +30,7 @@ std::vector<const TWReportingSessionWorkerClass*> allWorkerClasses() {
       &TWReportingSessionInputMessagesWorker::kWorkerClass,
       &TWReportingSessionMetriconWorker::kWorkerClass,
       &TWReportingSessionEnergybookWorker::kWorkerClass,
+      &TWReportingSessionMemoryLogWorker::kWorkerClass,
       &TWReportingSessionDiagwireWorker::kWorkerClass,
       &TWReportingSessionDriverSnapshotWorker::kWorkerClass,
       &TWReportingSessionCapsaWorker::kWorkerClass,

@@ -488,10 +488,11 @@ TEST_F(WorkerTest, TheDaemonsClassesComeInTheRegistrysOrder) {
               ElementsAre("TWReportingSessionTraceWorker", "TWReportingSessionVolumeMessagesWorker",
                           "TWReportingSessionGatherMessagesWorker", "TWReportingSessionSummaryWorker",
                           "TWReportingSessionInputMessagesWorker", "TWReportingSessionMetriconWorker",
-                          "TWReportingSessionEnergybookWorker", "TWReportingSessionDiagwireWorker",
-                          "TWReportingSessionDriverSnapshotWorker", "TWReportingSessionCapsaWorker",
-                          "TWReportingSessionDPWorker", "TWReportingSessionSummaryJsonFileWorker",
-                          "TWReportingSessionRtcWorker", "TWReportingSessionIssueDraftWorker"));
+                          "TWReportingSessionEnergybookWorker", "TWReportingSessionMemoryLogWorker",
+                          "TWReportingSessionDiagwireWorker", "TWReportingSessionDriverSnapshotWorker",
+                          "TWReportingSessionCapsaWorker", "TWReportingSessionDPWorker",
+                          "TWReportingSessionSummaryJsonFileWorker", "TWReportingSessionRtcWorker",
+                          "TWReportingSessionIssueDraftWorker"));
 }
 
 TEST_F(WorkerTest, TheRegistryIsFilledOnce) {
