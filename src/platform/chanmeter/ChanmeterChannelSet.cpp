@@ -15,18 +15,29 @@ std::vector<ChanmeterKey> keysOf(const ChanmeterRecords& records) {
   return keys;
 }
 
+template <typename T>
+void sortOnce(std::vector<T>& items) {
+  std::sort(items.begin(), items.end());
+  items.erase(std::unique(items.begin(), items.end()), items.end());
+}
+
 }  // namespace
 
 ChanmeterChannelSet::ChanmeterChannelSet(std::vector<ChanmeterKey> keys) : keys_(std::move(keys)) {
-  std::sort(keys_.begin(), keys_.end());
-  keys_.erase(std::unique(keys_.begin(), keys_.end()), keys_.end());
+  sortOnce(keys_);
+  for (const ChanmeterKey& key : keys_) {
+    if (groups_.empty() || groups_.back() != key.group) groups_.push_back(key.group);
+  }
+  sortOnce(groups_);
 }
 
 ChanmeterChannelSet::ChanmeterChannelSet(const ChanmeterRecords& records)
     : ChanmeterChannelSet(keysOf(records)) {}
 
 bool ChanmeterChannelSet::contains(const ChanmeterKey& key) const {
-  return std::binary_search(keys_.begin(), keys_.end(), key);
+  // A reading goes through every source for each set; most of what it finds is in another group.
+  return std::binary_search(groups_.begin(), groups_.end(), key.group) &&
+         std::binary_search(keys_.begin(), keys_.end(), key);
 }
 
 ChanmeterRecords ChanmeterChannelSet::selectedFrom(const ChanmeterRecords& records) const {

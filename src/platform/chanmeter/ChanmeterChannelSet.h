@@ -16,13 +16,14 @@ class ChanmeterChannelSet final : public ChanmeterChannels {
 
   // Ascending.
   const std::vector<ChanmeterKey>& keys() const { return keys_; }
-  // O(log n).
+  // O(log n); less for one of a group that none of these is in.
   bool contains(const ChanmeterKey& key) const;
   // The records of these channels, in their order.
   ChanmeterRecords selectedFrom(const ChanmeterRecords& records) const;
 
  private:
   std::vector<ChanmeterKey> keys_;
+  std::vector<std::optional<std::string>> groups_;  // of the keys, ascending, each once
 };
 
 // Those of `records` that are in that group and subgroup, each of them none for all; in their order.

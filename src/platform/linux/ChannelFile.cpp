@@ -5,15 +5,16 @@
 #include <cmath>
 #include <concepts>
 #include <memory>
-#include <nlohmann/json.hpp>
 #include <utility>
 
 #include "platform/linux/ChannelFailures.h"
+#include "platform/linux/JsonTree.h"
 
 namespace tonewerk {
 namespace {
 
-using Json = nlohmann::json;
+using Node = JsonTree::Node;
+using Kind = JsonTree::Kind;
 
 // Where in the file one stands. Lives on the stack; becomes text only when something is wrong there.
 struct Place {
@@ -32,70 +33,88 @@ struct Place {
 // the problem is then told.
 class ObjectReader {
  public:
-  ObjectReader(Json& json, const Place& place, ChannelFileProblem& problem)
-      : json_(json), place_(place), problem_(problem) {}
+  ObjectReader(const JsonTree& json, const Node& node, const Place& place, ChannelFileProblem& problem)
+      : json_(json), node_(node), place_(place), problem_(problem) {}
 
-  bool isObject() { return json_.is_object() || fail(kChannelsWrongType, place_, "is no object"); }
+  bool isObject() { return node_.kind == Kind::kObject || fail(kChannelsWrongType, place_, "is no object"); }
 
   // A value that may be missing is an optional one.
   template <typename T>
   bool read(const char* key, T& value) {
-    Json* field = find(key);
+    const Node* field = json_.field(node_, key);
     if (field == nullptr) return fail(kChannelsFieldMissing, {&place_, key}, "is missing");
     return convert(*field, {&place_, key}, value);
   }
   template <typename T>
   bool read(const char* key, std::optional<T>& value) {
-    Json* field = find(key);
+    const Node* field = json_.field(node_, key);
     return field == nullptr || convert(*field, {&place_, key}, value.emplace());
   }
 
   // Calls `readElement(reader, element)` for each object of an array.
   template <typename T, typename ReadElement>
   bool readList(const char* key, std::vector<T>& list, ReadElement readElement) {
-    Json* field = find(key);
+    const Node* field = json_.field(node_, key);
     const Place place{&place_, key};
     if (field == nullptr) return fail(kChannelsFieldMissing, place, "is missing");
-    if (!field->is_array()) return fail(kChannelsWrongType, place, "is no array");
-    list.reserve(field->size());
-    for (Json& element : *field) {
+    if (field->kind != Kind::kArray) return fail(kChannelsWrongType, place, "is no array");
+    list.clear();
+    list.reserve(field->count);
+    for (const Node* one = JsonTree::first(*field); one != JsonTree::end(*field);
+         one = JsonTree::next(*one)) {
       const Place elementPlace{&place, nullptr, list.size()};
-      ObjectReader reader(element, elementPlace, problem_);
+      ObjectReader reader(json_, *one, elementPlace, problem_);
       if (!reader.isObject() || !readElement(reader, list.emplace_back())) return false;
     }
     return true;
   }
 
  private:
-  Json* find(const char* key) {
-    const auto field = json_.find(key);
-    return field == json_.end() ? nullptr : &*field;
-  }
-
-  bool convert(Json& field, const Place& place, std::string& text) {
-    if (!field.is_string()) return fail(kChannelsWrongType, place, "is no text");
-    text = std::move(field.get_ref<std::string&>());
+  bool convert(const Node& field, const Place& place, std::string& text) {
+    if (field.kind != Kind::kText) return fail(kChannelsWrongType, place, "is no text");
+    text = json_.textOf(field);
     return true;
   }
 
-  bool convert(const Json& field, const Place& place, double& number) {
-    if (!field.is_number()) return fail(kChannelsWrongType, place, "is no number");
-    number = field.get<double>();
-    return true;
+  bool convert(const Node& field, const Place& place, double& number) {
+    switch (field.kind) {
+      case Kind::kInteger:
+        number = static_cast<double>(field.integer);
+        return true;
+      case Kind::kUnsigned:
+        number = static_cast<double>(field.unsignedInteger);
+        return true;
+      case Kind::kDouble:
+        number = field.number;
+        return true;
+      default:
+        return fail(kChannelsWrongType, place, "is no number");
+    }
   }
 
-  // Integers beyond 64 bits are doubles to the library.
   template <std::integral T>
-  bool convert(const Json& field, const Place& place, T& number) {
-    constexpr double kBeyond64Bits = 9223372036854775808.0;
-    const double* real = field.get_ptr<const Json::number_float_t*>();
-    const bool isInteger = field.is_number_integer() || (real != nullptr && std::abs(*real) >= kBeyond64Bits);
-    if (!isInteger) return fail(kChannelsWrongType, place, "is no integer");
-    const bool fits =
-        real == nullptr && (field.is_number_unsigned() ? std::in_range<T>(field.get<std::uint64_t>())
-                                                       : std::in_range<T>(field.get<std::int64_t>()));
-    if (!fits) return fail(kChannelsOutOfRange, place, "is out of range");
-    number = field.get<T>();
+  bool convert(const Node& field, const Place& place, T& number) {
+    switch (field.kind) {
+      case Kind::kInteger:
+        return take(field.integer, place, number);
+      case Kind::kUnsigned:
+        return take(field.unsignedInteger, place, number);
+      case Kind::kDouble: {
+        // Also what an integer beyond 64 bits has become.
+        constexpr double kBeyond64Bits = 9223372036854775808.0;
+        if (std::abs(field.number) >= kBeyond64Bits)
+          return fail(kChannelsOutOfRange, place, "is out of range");
+        return fail(kChannelsWrongType, place, "is no integer");
+      }
+      default:
+        return fail(kChannelsWrongType, place, "is no integer");
+    }
+  }
+
+  template <std::integral T>
+  bool take(std::integral auto value, const Place& place, T& number) {
+    if (!std::in_range<T>(value)) return fail(kChannelsOutOfRange, place, "is out of range");
+    number = static_cast<T>(value);
     return true;
   }
 
@@ -106,7 +125,8 @@ class ObjectReader {
     return false;
   }
 
-  Json& json_;
+  const JsonTree& json_;
+  const Node& node_;
   const Place& place_;
   ChannelFileProblem& problem_;
 };
@@ -156,32 +176,35 @@ bool readChannel(ObjectReader& reader, ChanmeterRecord& record) {
   return readValue(reader, record);
 }
 
-// The library's words from "line 3, column 7" on, without what was read last, which may be long.
-std::string wordsOf(const Json::parse_error& error) {
-  const std::string text = error.what();
+// The parser's words from "line 3, column 7" on, without what was read last, which may be long.
+std::string wordsOf(const std::string& text) {
   const std::size_t begin = std::min(text.find("line "), text.size());
   return text.substr(begin, text.find(';', begin) - begin);
 }
 
-std::optional<Json> parseJson(std::string_view text, ChannelFileProblem& problem) {
-  try {
-    return Json::parse(text);
-  } catch (const Json::parse_error& error) {
-    problem = {kChannelsNotJson, wordsOf(error)};
-  } catch (const Json::exception&) {
-    problem = {kChannelsOutOfRange, "a number is beyond what a double can hold"};
+bool parseJson(std::string_view text, JsonTree& json, ChannelFileProblem& problem) {
+  std::string words;
+  switch (json.parse(text, words)) {
+    case JsonTree::Failure::kNone:
+      return true;
+    case JsonTree::Failure::kNotJson:
+      problem = {kChannelsNotJson, wordsOf(words)};
+      return false;
+    case JsonTree::Failure::kNumberOutOfRange:
+      problem = {kChannelsOutOfRange, "a number is beyond what a double can hold"};
+      return false;
   }
-  return std::nullopt;
+  return false;
 }
 
 }  // namespace
 
 std::optional<ChannelFile> ChannelFile::parse(std::string_view text, ChannelFileProblem& problem) {
-  std::optional<Json> json = parseJson(text, problem);
-  if (!json) return std::nullopt;
+  JsonTree json;
+  if (!parseJson(text, json, problem)) return std::nullopt;
   ChannelFile file;
   const Place root;
-  ObjectReader reader(*json, root, problem);
+  ObjectReader reader(json, json.root(), root, problem);
   const auto readOne = [&](ObjectReader& channel, std::shared_ptr<const ChanmeterRecord>& kept) {
     auto record = std::make_shared<ChanmeterRecord>();
     record->key.driver = file.driver;

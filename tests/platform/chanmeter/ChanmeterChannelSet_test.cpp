@@ -70,6 +70,16 @@ TEST_F(ChanmeterChannelSetTest, SelectsItsOwnInTheRecordsOrder) {
   EXPECT_THAT(namesOf(set.selectedFrom(records)), ElementsAre("a", "c"));
 }
 
+TEST_F(ChanmeterChannelSetTest, ContainsItsOwnAlsoInSeveralGroupsAndInNone) {
+  const ChanmeterChannelSet set({records[4]->key, records[3]->key, records[2]->key, records[0]->key});
+  std::vector<std::string> contained;
+  for (const auto& one : records) {
+    if (set.contains(one->key)) contained.push_back(*one->key.name);
+  }
+  EXPECT_THAT(contained, ElementsAre("a", "c", "d", "e"));
+  EXPECT_FALSE(ChanmeterChannelSet(ChanmeterRecords{}).contains(records[3]->key));
+}
+
 TEST_F(ChanmeterChannelSetTest, ChannelsOfDifferentDriversAreDifferentChannels) {
   ChanmeterKey key = records[0]->key;
   key.driver = "Amp";
