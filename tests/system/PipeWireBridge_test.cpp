@@ -22,6 +22,7 @@ namespace {
 using std::chrono::milliseconds;
 using ::testing::EndsWith;
 using ::testing::SizeIs;
+using ::testing::StartsWith;
 
 // The payloads of all recorded events of this name, oldest first. None when there is no readable store.
 std::vector<nlohmann::json> eventsOf(const std::string& storePath, const std::string& name) {
@@ -204,6 +205,28 @@ TEST_F(PipeWireBridgeTest, PublishesWhatTheGraphsDriversDo) {
   bridge.signal(SIGTERM);
   EXPECT_EQ(bridge.wait(), 0);
   EXPECT_FALSE(std::filesystem::exists(channelFile()));
+}
+
+// The daemon's first session: what it subscribes to has to be there already.
+TEST_F(PipeWireBridgeTest, HasTheDaemonReportWhatTheDriversDidDuringASession) {
+  play();
+  ASSERT_TRUE(waitUntil([&] { return counted("Cycles") > 20; }));
+  stopPlaying();
+
+  const std::string simple = "com.orvane.longformaudio.Chanmetering.Simple";
+  const std::string histogram = "com.orvane.longformaudio.Chanmetering.Histogram";
+  ASSERT_TRUE(waitUntil([&] { return eventsOf(daemon.storePath(), histogram).size() == 1; }));
+  ASSERT_THAT(eventsOf(daemon.storePath(), simple), SizeIs(1));
+  const nlohmann::json counts = eventsOf(daemon.storePath(), simple)[0];
+  const std::int64_t cycles = counts.at("PipeWire_Tx_speaker_Simple_Cycles");
+  EXPECT_GT(cycles, 20);
+  EXPECT_EQ(counts.at("PipeWire_Tx_Simple_Cycles"), cycles);
+  EXPECT_FALSE(counts.contains("PipeWire_Rx_Simple_Cycles"));
+  const nlohmann::json times = eventsOf(daemon.storePath(), histogram)[0];
+  const std::string period = times.at("PipeWire_Tx_speaker_Histogram_Period");
+  EXPECT_THAT(period, StartsWith("count=9,lower=0,upper=1000000,min="));
+  EXPECT_THAT(times.at("PipeWire_Tx_speaker_Histogram_ProcessingTime").get<std::string>(),
+              StartsWith("count=14,lower=0,upper=1000,min="));
 }
 
 TEST_F(PipeWireBridgeTest, ReportsOverloadsOfAStreamThatHangs) {
