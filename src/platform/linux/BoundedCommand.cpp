@@ -65,6 +65,7 @@ class SpawnSettings {
 
   int spawn(pid_t& process, const std::vector<std::string>& arguments) const {
     std::vector<char*> pointers;
+    pointers.reserve(arguments.size() + 1);
     for (const std::string& argument : arguments) pointers.push_back(const_cast<char*>(argument.c_str()));
     pointers.push_back(nullptr);
     return posix_spawnp(&process, pointers.front(), &actions_, &attributes_, pointers.data(), environ);

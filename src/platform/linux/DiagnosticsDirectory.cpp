@@ -151,10 +151,10 @@ std::vector<DiagnosticsDirectory::FileEntry> DiagnosticsDirectory::filesOf(Diagn
                                                                            std::string_view name) const {
   std::vector<FileEntry> files;
   if (!contains(kind, name)) return files;
-  const std::string path = pathOf(kind, name);
+  const std::string path = pathOf(kind, name) + "/";
   for (std::string& file : namesIn(path)) {
     struct stat status {};
-    if (lstat((path + "/" + file).c_str(), &status) != 0 || !S_ISREG(status.st_mode)) continue;
+    if (lstat((path + file).c_str(), &status) != 0 || !S_ISREG(status.st_mode)) continue;
     files.push_back({std::move(file), static_cast<std::uint64_t>(status.st_size)});
   }
   return files;

@@ -13,7 +13,7 @@ void LinuxWhirlcapRequest::request(std::string requester, std::string reason, st
   DiagnosticItem item{DiagnosticKind::kWhirlcap};
   item.request = {{"requester", requester},
                   {"reason", reason},
-                  {"description", std::move(description)},
+                  {"description", description},
                   {"payload", std::move(payload)},
                   {"flags", ValueArray{flags.first, flags.second}}};
   const std::error_code error = store_.add(std::move(item), {});

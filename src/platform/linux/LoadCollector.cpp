@@ -15,7 +15,7 @@ DiagnosticCollector::Result LoadCollector::collect() {
       result.problem += (result.problem.empty() ? "" : "; ") + path + ": " + error.message();
       continue;
     }
-    result.text += "== " + path + "\n" + text;
+    result.text.append("== ").append(path).append("\n").append(text);
   }
   return result;
 }

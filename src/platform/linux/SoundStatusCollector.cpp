@@ -51,7 +51,7 @@ DiagnosticCollector::Result SoundStatusCollector::collect() {
       result.problem = "more than " + std::to_string(limits_.bytes) + " bytes";
       break;
     }
-    result.text += "== " + path + "\n" + text;
+    result.text.append("== ").append(path).append("\n").append(text);
   }
   return result;
 }
