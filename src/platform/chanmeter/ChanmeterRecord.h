@@ -19,6 +19,7 @@ struct ChanmeterKey {
   std::optional<std::string> subGroup = {};
   std::optional<std::string> name = {};
 
+  // The linter takes the three-way comparison for one with a pointer. NOLINTNEXTLINE(modernize-use-nullptr)
   friend auto operator<=>(const ChanmeterKey&, const ChanmeterKey&) = default;
   friend bool operator==(const ChanmeterKey&, const ChanmeterKey&) = default;
 };
