@@ -14,7 +14,6 @@ namespace tonewerk {
 namespace {
 
 using std::chrono::milliseconds;
-using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 using ::testing::SizeIs;
 
