@@ -6,6 +6,7 @@
 #include <string>
 #include <utility>
 
+#include "monitor/TWReportingSystemMonitor.h"
 #include "platform/Clock.h"
 #include "platform/LogLine.h"
 #include "platform/ProcessInformation.h"
@@ -35,7 +36,9 @@ std::shared_ptr<TWReportingService> TWReportingService::make(std::function<void(
 }
 
 TWReportingService::TWReportingService(std::function<void()> endProcess)
-    : endProcess_(std::move(endProcess)) {}
+    : endProcess_(std::move(endProcess)) {
+  TWReportingSystemMonitor::initializeWithQueue(TWReportingUtilityGetReportingServerQueue());
+}
 
 TWReportingService::~TWReportingService() { infoLog(TWReportingClientCategory(), "destroying service"); }
 

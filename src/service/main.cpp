@@ -12,6 +12,7 @@
 #include <sys/resource.h>
 #include <unistd.h>
 
+#include "monitor/TWReportingSystemMonitor.h"
 #include "platform/LogCategory.h"
 #include "platform/LogLine.h"
 #include "platform/Platform.h"
@@ -82,7 +83,10 @@ class Daemon {
   void endInOrder() {
     listener_.shutDown();
     SerialQueue& queue = context_.reportingServerQueue();
-    queue.async([this] { service_->stopSingleMessageSession(); });
+    queue.async([this] {
+      service_->stopSingleMessageSession();
+      TWReportingSystemMonitor::reset();  // while there is a queue for its handlers
+    });
     queue.drain();
     flushSinks();
   }

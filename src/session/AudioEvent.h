@@ -26,6 +26,7 @@ using AudioEventType = std::uint16_t;
 inline constexpr AudioEventType kTypeGeneric = 0;
 inline constexpr AudioEventType kTypeStart = 1;
 inline constexpr AudioEventType kTypeStop = 2;
+inline constexpr AudioEventType kTypeSetup = 5;
 inline constexpr AudioEventType kTypeError = 6;
 inline constexpr AudioEventType kTypeIssueDetector = 7;
 inline constexpr AudioEventType kTypeEnergybook = 8;

@@ -2,6 +2,7 @@
 #include "workers/TWReportingWorkerClasses.h"
 
 #include "driver/TWReportingSessionDriverSnapshotWorker.h"
+#include "monitor/TWReportingSessionSystemMonitorWorker.h"
 #include "workers/diagnostics/TWReportingSessionCapsaWorker.h"
 #include "workers/diagnostics/TWReportingSessionIssueDraftWorker.h"
 #include "workers/diagnostics/TWReportingSessionMemoryLogWorker.h"
@@ -33,6 +34,7 @@ std::vector<const TWReportingSessionWorkerClass*> allWorkerClasses() {
       &TWReportingSessionMemoryLogWorker::kWorkerClass,
       &TWReportingSessionDiagwireWorker::kWorkerClass,
       &TWReportingSessionDriverSnapshotWorker::kWorkerClass,
+      &TWReportingSessionSystemMonitorWorker::kWorkerClass,
       &TWReportingSessionCapsaWorker::kWorkerClass,
       &TWReportingSessionDPWorker::kWorkerClass,
       &TWReportingSessionSummaryJsonFileWorker::kWorkerClass,

@@ -3,6 +3,7 @@
 
 #include <gtest/gtest.h>
 
+#include "monitor/TWReportingSystemMonitor.h"
 #include "service/TWReportingClientServerInstance.h"
 #include "support/ServiceTest.h"
 
@@ -274,9 +275,20 @@ TEST_F(TWReportingServiceTest, TheReapersTimerEndsWithTheSessionAndANewOneComesW
 }
 
 TEST_F(TWReportingServiceTest, ATickWithoutASessionDoesNothing) {
+  test.log.clear();
   service->_reapSingleMessageSession();
   run();
   EXPECT_THAT(test.log.textsOf("twrs"), IsEmpty());
+}
+
+TEST_F(TWReportingServiceTest, FollowsTheSystemsFeaturesOnTheWorkQueueFromItsMakingOn) {
+  const auto map = TWReportingSystemMonitor::getSystemMonitorDictionary();
+  ASSERT_NE(map, nullptr);
+  EXPECT_FALSE(test.notifications.post("com.orvane.homedeck.ringerstate", 1));
+  EXPECT_EQ(map->find("ringerstate"), std::nullopt);
+  test.queues.find("com.orvane.tonewerk.reporting.server")->runAll();
+  ASSERT_NE(map->find("ringerstate"), std::nullopt);
+  EXPECT_TRUE(map->find("ringerstate")->boolean("ringerstate"));
 }
 
 TEST_F(TWReportingServiceTest, AtItsEndTheDaemonStopsTheSingleMessageSession) {

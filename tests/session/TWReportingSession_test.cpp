@@ -490,9 +490,9 @@ TEST_F(WorkerTest, TheDaemonsClassesComeInTheRegistrysOrder) {
                           "TWReportingSessionInputMessagesWorker", "TWReportingSessionMetriconWorker",
                           "TWReportingSessionEnergybookWorker", "TWReportingSessionMemoryLogWorker",
                           "TWReportingSessionDiagwireWorker", "TWReportingSessionDriverSnapshotWorker",
-                          "TWReportingSessionCapsaWorker", "TWReportingSessionDPWorker",
-                          "TWReportingSessionSummaryJsonFileWorker", "TWReportingSessionRtcWorker",
-                          "TWReportingSessionIssueDraftWorker"));
+                          "TWReportingSessionSystemMonitorWorker", "TWReportingSessionCapsaWorker",
+                          "TWReportingSessionDPWorker", "TWReportingSessionSummaryJsonFileWorker",
+                          "TWReportingSessionRtcWorker", "TWReportingSessionIssueDraftWorker"));
 }
 
 TEST_F(WorkerTest, TheRegistryIsFilledOnce) {

@@ -1,0 +1,71 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "monitor/ObservableMap.h"
+
+#include <utility>
+
+namespace tonewerk {
+
+ObservableMap::Observation::Observation(Observation&& other) noexcept
+    : map_(std::move(other.map_)), identifier_(other.identifier_) {}
+
+ObservableMap::Observation& ObservableMap::Observation::operator=(Observation&& other) noexcept {
+  if (this == &other) return *this;
+  end();
+  map_ = std::move(other.map_);
+  identifier_ = other.identifier_;
+  return *this;
+}
+
+ObservableMap::Observation::~Observation() { end(); }
+
+void ObservableMap::Observation::end() {
+  const std::shared_ptr<ObservableMap> map = std::move(map_);
+  if (map == nullptr) return;
+  Observing ended;  // what the observer holds is let go after the lock
+  const std::lock_guard lock(*map);
+  const auto found = map->observers_.find(identifier_);
+  if (found == map->observers_.end()) return;
+  ended = std::move(found->second);
+  map->observers_.erase(found);
+}
+
+std::optional<ValueMap> ObservableMap::find(std::string_view key) const {
+  const std::lock_guard lock(*this);
+  const auto found = values_.find(key);
+  return found == values_.end() ? std::nullopt : std::optional(found->second);
+}
+
+void ObservableMap::set(std::string_view key, ValueMap value) {
+  const std::lock_guard lock(*this);
+  values_.insert_or_assign(std::string(key), std::move(value));
+  wake(key);
+}
+
+// By identifier rather than by place, since an observer may end any observation and begin others.
+void ObservableMap::wake(std::string_view key) {
+  const std::uint64_t last = lastIdentifier_;
+  for (auto next = observers_.begin(); next != observers_.end() && next->first <= last;) {
+    const std::uint64_t identifier = next->first;
+    if (next->second.key == key) {
+      const std::shared_ptr<const Observer> observer = next->second.observer;
+      (*observer)(key);
+    }
+    next = observers_.upper_bound(identifier);
+  }
+}
+
+ObservableMap::Observation ObservableMap::observe(const std::shared_ptr<ObservableMap>& map,
+                                                  std::string_view key, Observer observer) {
+  const std::lock_guard lock(*map);
+  const std::uint64_t identifier = ++map->lastIdentifier_;
+  map->observers_.emplace(identifier,
+                          Observing{std::string(key), std::make_shared<const Observer>(std::move(observer))});
+  return {map, identifier};
+}
+
+std::size_t ObservableMap::observerCount() const {
+  const std::lock_guard lock(*this);
+  return observers_.size();
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,60 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "monitor/TWReportingSessionSystemMonitorWorker.h"
+
+#include <utility>
+
+#include "monitor/TWReportingSystemMonitor.h"
+#include "session/TWReportingKeys.h"
+#include "session/TWReportingSession.h"
+#include "session/TWReportingSessionMessage.h"
+
+namespace tonewerk {
+namespace {
+
+constexpr std::string_view kLastUpdated = "last_updated";
+
+}  // namespace
+
+const TWReportingSessionWorkerClass TWReportingSessionSystemMonitorWorker::kWorkerClass =
+    workerClassOf<TWReportingSessionSystemMonitorWorker>("TWReportingSessionSystemMonitorWorker");
+
+TWReportingSessionSystemMonitorWorker::TWReportingSessionSystemMonitorWorker(
+    const std::shared_ptr<TWReportingSession>& owner)
+    : systemMonitorDictionary_(TWReportingSystemMonitor::getSystemMonitorDictionary()),
+      featureKeys_(TWReportingSystemMonitor::getSystemMonitorKeys()) {
+  session = owner;
+}
+
+std::optional<bool> TWReportingSessionSystemMonitorWorker::start() {
+  if (systemMonitorDictionary_ == nullptr) return true;
+  for (const std::string& key : featureKeys_) {
+    observeValueForKeyPath(key);  // what it is now
+    observations_.push_back(
+        ObservableMap::observe(systemMonitorDictionary_, key,
+                               [this](std::string_view changed) { observeValueForKeyPath(changed); }));
+  }
+  return true;
+}
+
+void TWReportingSessionSystemMonitorWorker::stop() { observations_.clear(); }
+
+void TWReportingSessionSystemMonitorWorker::observeValueForKeyPath(std::string_view key) {
+  const std::optional<ValueMap> state = systemMonitorDictionary_->find(key);
+  handleChange(state ? &*state : nullptr);
+}
+
+void TWReportingSessionSystemMonitorWorker::handleChange(const ValueMap* state) {
+  ValueMap payload = state == nullptr ? ValueMap() : *state;
+  if (const Value* readAt = payload.find(TWReportingInternalEventEpochTime)) {
+    payload.set(kLastUpdated, Value(*readAt));  // a copy: setting moves what is in the map
+    // The message gets the times of its own sending.
+    payload.erase(TWReportingInternalEventEpochTime);
+    payload.erase(TWReportingInternalEventSystemUptimeSec);
+  }
+  const auto owner = session.lock();
+  if (payload.empty() || owner == nullptr) return;
+  owner->sendMessage(
+      std::make_shared<TWReportingSessionMessage>(std::move(payload), kCategorySetup, kTypeSetup));
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,178 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "monitor/TWReportingSystemMonitor.h"
+
+#include <cmath>
+#include <mutex>
+#include <utility>
+
+#include "monitor/FeatureTable.h"
+#include "platform/Clock.h"
+#include "platform/LogLine.h"
+#include "platform/PreferenceStore.h"
+#include "platform/SystemInformation.h"
+#include "session/TWReportingContext.h"
+#include "session/TWReportingKeys.h"
+#include "session/TWReportingUtility.h"
+
+namespace tonewerk {
+namespace {
+
+constexpr std::string_view kDeviceName = "device_name";
+constexpr std::string_view kDisableReporting = "disable_reporting";
+
+// The ringer's state when it is on.
+constexpr std::uint64_t kRingerOn = 1;
+
+const auto category = &TWReportingServiceDelegateCategory;
+
+const Platform& platform() { return TWReportingContext::current().platform(); }
+
+// Where the process keeps its one monitor.
+struct OneMonitor {
+  // Held while the monitor is made or dropped, so that there are never two. Not needed for reading: whoever
+  // reads may hold the map's lock, which making the monitor takes.
+  std::mutex making;
+  std::mutex reading;  // guards `monitor`; nothing else is locked under it
+  std::shared_ptr<TWReportingSystemMonitor> monitor;
+
+  static OneMonitor& ofProcess() { return TWReportingContext::current().singles().get<OneMonitor>(); }
+
+  std::shared_ptr<TWReportingSystemMonitor> get() {
+    const std::lock_guard lock(reading);
+    return monitor;
+  }
+  std::shared_ptr<TWReportingSystemMonitor> exchange(std::shared_ptr<TWReportingSystemMonitor> other) {
+    const std::lock_guard lock(reading);
+    return std::exchange(monitor, std::move(other));
+  }
+};
+
+}  // namespace
+
+void TWReportingSystemMonitor::initializeWithQueue(SerialQueue& queue) {
+  OneMonitor& one = OneMonitor::ofProcess();
+  const std::lock_guard lock(one.making);
+  if (one.get() == nullptr) one.exchange(initWithQueue(queue));
+}
+
+std::shared_ptr<ObservableMap> TWReportingSystemMonitor::getSystemMonitorDictionary() {
+  const auto monitor = OneMonitor::ofProcess().get();
+  return monitor == nullptr ? nullptr : monitor->systemMonitorDictionary_;
+}
+
+std::vector<std::string> TWReportingSystemMonitor::getSystemMonitorKeys() {
+  std::vector<std::string> keys;
+  if (const auto monitor = OneMonitor::ofProcess().get()) {
+    for (const ValueMap::Entry& feature : monitor->features_) keys.push_back(feature.key.string());
+  }
+  return keys;
+}
+
+void TWReportingSystemMonitor::reset() {
+  OneMonitor& one = OneMonitor::ofProcess();
+  const std::lock_guard lock(one.making);
+  if (const auto monitor = one.exchange(nullptr)) monitor->clear();
+}
+
+std::shared_ptr<TWReportingSystemMonitor> TWReportingSystemMonitor::initWithQueue(SerialQueue& queue) {
+  auto monitor = std::make_shared<TWReportingSystemMonitor>(Private(), queue);
+  monitor->populateInitialValues();
+  monitor->listenForFeatureStateChanges();
+  return monitor;
+}
+
+TWReportingSystemMonitor::TWReportingSystemMonitor(Private, SerialQueue& queue)
+    : defaults_(TWReportingDefaults()),
+      queue_(queue),
+      notifications_(platform().notifications),
+      features_(featureTable()) {}
+
+TWReportingSystemMonitor::~TWReportingSystemMonitor() { clear(); }
+
+ValueMap TWReportingSystemMonitor::TWReportingDefaults() {
+  const ValueMap suite = platform().preferences.readAll(kReportingSuite);
+  ValueMap defaults;
+  if (suite.contains(kDeviceName)) defaults.set(kDeviceName, suite.text(kDeviceName));
+  if (suite.contains(kDisableReporting)) {
+    defaults.set(kDisableReporting, suite.boolean(kDisableReporting));
+  } else {
+    defaults.set(kDisableReporting, 0);
+  }
+  return defaults;
+}
+
+void TWReportingSystemMonitor::populateInitialValues() {
+  infoLog(category(), "populateInitialValues %@", features_);
+  const std::lock_guard lock(*systemMonitorDictionary_);
+  for (const ValueMap::Entry& feature : features_) {
+    if (const auto state = getFeatureState(feature.key)) systemMonitorDictionary_->set(feature.key, *state);
+  }
+}
+
+void TWReportingSystemMonitor::listenForFeatureStateChanges() {
+  infoLog(category(), "listening for features %@", features_);
+  const ValueMap features = features_;
+  for (const ValueMap::Entry& feature : features) {
+    const std::string notification = feature.value.asMap()->text(kFeatureNotification);
+    if (!notification.empty()) listenFor(feature.key.string(), notification);
+  }
+}
+
+void TWReportingSystemMonitor::listenFor(const std::string& name, const std::string& notification) {
+  // A handler that runs at once waits here until its token can be found.
+  const std::lock_guard lock(*systemMonitorDictionary_);
+  const auto [status, token] = notifications_.registerHandler(
+      notification, queue_, [weak = weak_from_this(), name](NotificationService::Token told) {
+        if (const auto monitor = weak.lock()) monitor->featureChanged(name, told);
+      });
+  ValueMap descriptor = *descriptorOf(name);
+  descriptor.set(kFeatureNotifyToken, token);
+  features_.set(name, std::move(descriptor));
+  defaultLog(category(), "notify setup result %i token %i", status, token);
+}
+
+void TWReportingSystemMonitor::featureChanged(std::string_view name, NotificationService::Token token) {
+  infoLog(category(), "feature changes featureName=%@ token=%i", name, token);
+  const std::lock_guard lock(*systemMonitorDictionary_);
+  std::optional<ValueMap> state = getFeatureState(name);
+  if (state && state != systemMonitorDictionary_->find(name)) {
+    systemMonitorDictionary_->set(name, std::move(*state));
+  }
+}
+
+const ValueMap* TWReportingSystemMonitor::descriptorOf(std::string_view name) const {
+  const Value* descriptor = features_.find(name);
+  return descriptor == nullptr ? nullptr : descriptor->asMap();
+}
+
+std::optional<ValueMap> TWReportingSystemMonitor::getFeatureState(std::string_view name) const {
+  defaultLog(category(), "getting feature %@", name);
+  const ValueMap* descriptor = descriptorOf(name);
+  if (descriptor == nullptr || !descriptor->contains(kFeatureDomain)) return std::nullopt;
+
+  ValueMap state;
+  if (descriptor->contains(kFeatureDefaultsDomain)) {
+    const auto value = platform().preferences.read(descriptor->text(kFeatureDefaultsDomain), name);
+    if (value) state.set(name, *value);
+  } else if (descriptor->contains(kFeatureNotifyToken)) {
+    const auto token = static_cast<NotificationService::Token>(descriptor->integer(kFeatureNotifyToken));
+    const std::optional<std::uint64_t> posted = notifications_.state(token);
+    if (posted) state.set(name, *posted == kRingerOn);
+  }
+  if (state.empty()) return std::nullopt;
+  state.set(TWReportingInternalEventEpochTime, platform().clock.now());
+  state.set(TWReportingInternalEventSystemUptimeSec,
+            static_cast<std::int32_t>(std::lround(platform().system.uptimeSeconds())));
+  return state;
+}
+
+void TWReportingSystemMonitor::clear() {
+  const std::lock_guard lock(*systemMonitorDictionary_);
+  for (const ValueMap::Entry& feature : features_) {
+    const ValueMap* descriptor = feature.value.asMap();
+    if (!descriptor->contains(kFeatureNotifyToken)) continue;
+    notifications_.cancel(static_cast<NotificationService::Token>(descriptor->integer(kFeatureNotifyToken)));
+  }
+}
+
+}  // namespace tonewerk

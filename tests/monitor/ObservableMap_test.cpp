@@ -1,0 +1,173 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "monitor/ObservableMap.h"
+
+#include <gmock/gmock.h>
+#include <string>
+#include <thread>
+#include <utility>
+#include <vector>
+
+namespace tonewerk {
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+
+class ObservableMapTest : public ::testing::Test {
+ protected:
+  using Observation = ObservableMap::Observation;
+
+  // An observer that writes down its name, the key and what the map says then.
+  ObservableMap::Observer recorder(const std::string& name) {
+    return [this, name](std::string_view key) {
+      woken.push_back(name + " " + std::string(key) + map->find(key)->text());
+    };
+  }
+  Observation observe(std::string_view key, ObservableMap::Observer observer) {
+    return ObservableMap::observe(map, key, std::move(observer));
+  }
+
+  std::shared_ptr<ObservableMap> map = std::make_shared<ObservableMap>();
+  std::vector<std::string> woken;
+};
+
+TEST_F(ObservableMapTest, HoldsWhatWasSetLast) {
+  EXPECT_EQ(map->find("a"), std::nullopt);
+  map->set("a", {{"n", 1}});
+  map->set("a", {{"n", 2}});
+  EXPECT_EQ(map->find("a"), (ValueMap{{"n", 2}}));
+  EXPECT_EQ(map->find("b"), std::nullopt);
+}
+
+TEST_F(ObservableMapTest, WakesTheObserversOfAKeyInsideTheSetInTheirOrder) {
+  const auto first = observe("a", recorder("first"));
+  const auto other = observe("b", recorder("other"));
+  const auto second = observe("a", recorder("second"));
+  map->set("a", {{"n", 1}});
+  EXPECT_THAT(woken, ElementsAre(R"(first a{"n":1})", R"(second a{"n":1})"));
+}
+
+TEST_F(ObservableMapTest, AnEqualValueWakesToo) {
+  const auto observation = observe("a", recorder("it"));
+  map->set("a", {{"n", 1}});
+  map->set("a", {{"n", 1}});
+  EXPECT_EQ(woken.size(), 2U);
+}
+
+TEST_F(ObservableMapTest, NoneIsWokenAfterItsObservationEnded) {
+  auto observation = observe("a", recorder("it"));
+  observation = {};
+  map->set("a", {});
+  EXPECT_THAT(woken, IsEmpty());
+  EXPECT_EQ(map->observerCount(), 0U);
+}
+
+TEST_F(ObservableMapTest, AMovedObservationGoesOn) {
+  auto observation = observe("a", recorder("it"));
+  Observation moved(std::move(observation));
+  Observation again;
+  again = std::move(moved);
+  map->set("a", {});
+  EXPECT_EQ(woken.size(), 1U);
+  EXPECT_EQ(map->observerCount(), 1U);
+}
+
+TEST_F(ObservableMapTest, AnObservationKeepsTheMapAlive) {
+  const std::weak_ptr<ObservableMap> weak = map;
+  auto observation = observe("a", [](std::string_view) {});
+  map.reset();
+  EXPECT_FALSE(weak.expired());
+  observation = {};
+  EXPECT_TRUE(weak.expired());
+}
+
+TEST_F(ObservableMapTest, AnObserverMayEndItsOwnObservation) {
+  Observation observation;
+  const std::string captured = "alive";
+  observation = observe("a", [&, captured](std::string_view) {
+    observation = {};
+    woken.push_back(captured);  // what the observer holds outlives the call
+  });
+  const auto other = observe("a", recorder("other"));
+  map->set("a", {});
+  map->set("a", {});
+  EXPECT_THAT(woken, ElementsAre("alive", "other a{}", "other a{}"));
+}
+
+TEST_F(ObservableMapTest, AnObserverMayEndOthersBeforeAndBehindIt) {
+  Observation before;
+  Observation behind;
+  before = observe("a", recorder("before"));
+  const auto middle = observe("a", [&](std::string_view) {
+    before = {};
+    behind = {};
+  });
+  behind = observe("a", recorder("behind"));
+  const auto last = observe("a", recorder("last"));
+  map->set("a", {});
+  EXPECT_THAT(woken, ElementsAre("before a{}", "last a{}"));
+  map->set("a", {});
+  EXPECT_THAT(woken, ElementsAre("before a{}", "last a{}", "last a{}"));
+}
+
+TEST_F(ObservableMapTest, AnObserverThatComesWhileOthersAreWokenIsWokenTheNextTime) {
+  Observation late;
+  const auto observation = observe("a", [&](std::string_view) { late = observe("a", recorder("late")); });
+  map->set("a", {});
+  EXPECT_THAT(woken, IsEmpty());
+  map->set("b", {});
+  EXPECT_EQ(map->observerCount(), 2U);
+}
+
+TEST_F(ObservableMapTest, AnObserverMaySetTheMap) {
+  const auto other = observe("b", recorder("b's"));
+  const auto first = observe("a", [&](std::string_view) {
+    if (map->find("a") == ValueMap{{"n", 1}}) map->set("a", {{"n", 2}});
+    map->set("b", {});
+  });
+  const auto second = observe("a", recorder("second"));
+  map->set("a", {{"n", 1}});
+  // The inner set wakes everybody; the outer one then goes on with what holds by now.
+  EXPECT_THAT(woken, ElementsAre("b's b{}", R"(second a{"n":2})", "b's b{}", R"(second a{"n":2})"));
+}
+
+TEST_F(ObservableMapTest, EndingAnObservationWaitsForItsObserverOnAnotherThread) {
+  std::atomic<bool> isRunning = false;
+  std::atomic<bool> mayEnd = false;
+  bool hasEnded = false;  // no atomic: the wait orders it
+  auto observation = observe("a", [&](std::string_view) {
+    isRunning = true;
+    isRunning.notify_all();
+    mayEnd.wait(false);
+    hasEnded = true;
+  });
+  std::thread setter([&] { map->set("a", {}); });
+  isRunning.wait(false);
+  std::thread releaser([&] {
+    mayEnd = true;
+    mayEnd.notify_all();
+  });
+  observation = {};
+  EXPECT_TRUE(hasEnded);
+  setter.join();
+  releaser.join();
+}
+
+TEST_F(ObservableMapTest, ReadingJudgingAndSettingUnderTheLockIsOneStep) {
+  constexpr int kEach = 2000;
+  const auto count = [&] {
+    for (int at = 0; at < kEach; ++at) {
+      const std::lock_guard lock(*map);
+      const auto held = map->find("a");
+      map->set("a", {{"n", held ? held->integer("n") + 1 : 1}});
+    }
+  };
+  std::thread one(count);
+  std::thread other(count);
+  one.join();
+  other.join();
+  EXPECT_EQ(map->find("a")->integer("n"), 2 * kEach);
+}
+
+}  // namespace
+}  // namespace tonewerk
