@@ -72,12 +72,12 @@ class TwctlTest : public RunningDaemonTest {
 TEST_F(TwctlTest, EveryCommandHelps) {
   EXPECT_EQ(run({"--help"}), kDone);
   for (const std::string name :
-       {"list", "validate", "send", "replay", "events", "power", "defaults", "kill"}) {
+       {"list", "validate", "send", "replay", "events", "power", "defaults", "notify", "kill"}) {
     SCOPED_TRACE(name);
     EXPECT_THAT(output, HasSubstr("\n  " + name + " "));
   }
   for (const std::string name :
-       {"list", "validate", "send", "replay", "events", "power", "defaults", "kill"}) {
+       {"list", "validate", "send", "replay", "events", "power", "defaults", "notify", "kill"}) {
     SCOPED_TRACE(name);
     EXPECT_EQ(run({name, "--help"}), kDone);
     EXPECT_THAT(output, AllOf(HasSubstr("Usage: twctl " + name), HasSubstr("--json")));
@@ -105,6 +105,7 @@ TEST_F(TwctlTest, WrongUsageIsStatusTwo) {
       {"events", "--limit", "0"},
       {"defaults"},
       {"defaults", "write", "org.example", "key"},
+      {"notify", "post", "org.example", "loud"},
   };
   for (const std::vector<std::string>& arguments : wrong) {
     EXPECT_EQ(run(arguments), kWrongUsage) << ::testing::PrintToString(arguments);
@@ -312,6 +313,34 @@ TEST_F(TwctlTest, WhatIsWrittenTakesEffectInTheRunningDaemon) {
     client.send({{"number", ++sent}}, 4, kTypeStart, {kSession});
     return events.named("com.orvane.longformaudio.Playback.Start").size() + 20 < sent;
   }));
+}
+
+TEST_F(TwctlTest, ARunningSessionIsToldOfTheRingerThatIsPosted) {
+  DaemonClient client = connect();
+  client.create(kSession, 7);
+  client.start(kSession);
+  EXPECT_EQ(run({"notify", "post", "com.orvane.homedeck.ringerstate", "1"}), kDone) << errors;
+  EXPECT_TRUE(waitForEvents("com.orvane.longformaudio.Setup.Setup", 1)) << daemon.log();
+  EXPECT_EQ(run({"notify", "post", "com.orvane.homedeck.ringerstate", "2"}), kDone) << errors;
+  EXPECT_TRUE(waitForEvents("com.orvane.longformaudio.Setup.Setup", 2));
+  const auto told = RecordedEvents(daemon.storePath()).named("com.orvane.longformaudio.Setup.Setup");
+  ASSERT_GE(told.size(), 2U);
+  EXPECT_EQ(told.front().value("ringerstate", json()), true);
+  EXPECT_EQ(told.back().value("ringerstate", json()), false);
+  EXPECT_TRUE(told.front().contains("last_updated"));
+  EXPECT_EQ(run({"notify", "get", "--json", "com.orvane.homedeck.ringerstate"}), kDone);
+  EXPECT_THAT(objects(output), ElementsAre(json{{"name", "com.orvane.homedeck.ringerstate"}, {"state", 2}}));
+}
+
+TEST_F(TwctlTest, ARunningSessionIsToldOfTheDevicesNameThatIsWritten) {
+  DaemonClient client = connect();
+  client.create(kSession, 7);
+  client.start(kSession);
+  EXPECT_EQ(run({"defaults", "write", "com.orvane.tonewerk", "device_name", "Kitchen"}), kDone) << errors;
+  EXPECT_TRUE(waitForEvents("com.orvane.longformaudio.Setup.Setup", 1)) << daemon.log();
+  const auto told = RecordedEvents(daemon.storePath()).named("com.orvane.longformaudio.Setup.Setup");
+  ASSERT_GE(told.size(), 1U);
+  EXPECT_EQ(told.front().value("device_name", ""), "Kitchen");
 }
 
 TEST_F(TwctlTest, KillEndsTheDaemonAndThenNoneAnswers) {

@@ -30,11 +30,13 @@ class CommandLineTest : public testing::Test {
  protected:
   CommandLineTest() {
     setenv("TONEWERK_REPORTING_SOCKET", socket_.c_str(), 1);
+    setenv("RUNTIME_DIRECTORY", directory_.path("runtime").c_str(), 1);
     setenv("STATE_DIRECTORY", directory_.path("state").c_str(), 1);
     setenv("CONFIGURATION_DIRECTORY", directory_.path("configuration").c_str(), 1);
   }
   void TearDown() override {
-    for (const char* name : {"TONEWERK_REPORTING_SOCKET", "STATE_DIRECTORY", "CONFIGURATION_DIRECTORY"})
+    for (const char* name :
+         {"TONEWERK_REPORTING_SOCKET", "RUNTIME_DIRECTORY", "STATE_DIRECTORY", "CONFIGURATION_DIRECTORY"})
       unsetenv(name);
   }
 
@@ -68,8 +70,8 @@ class CommandLineTest : public testing::Test {
 };
 
 TEST_F(CommandLineTest, HelpsWithEveryCommand) {
-  for (const char* name :
-       {"list", "validate", "send", "replay", "events", "metrics", "power", "rtc", "defaults", "captures", "drafts", "whirlcaps", "kill"}) {
+  for (const char* name : {"list", "validate", "send", "replay", "events", "metrics", "power", "rtc",
+                           "defaults", "notify", "captures", "drafts", "whirlcaps", "kill"}) {
     EXPECT_EQ(run({name, "--help"}), kDone);
     EXPECT_THAT(output(), HasSubstr("--json")) << name;
     EXPECT_THAT(errors(), IsEmpty());
@@ -107,7 +109,14 @@ TEST_F(CommandLineTest, CallsWrongUsageWrong) {
            {"metrics", "--since", "then"},
            {"power", "more"},
            {"defaults"},
-           {"defaults", "write", "a.b", "c"}}) {
+           {"defaults", "write", "a.b", "c"},
+           {"notify"},
+           {"notify", "post"},
+           {"notify", "post", "a", "loud"},
+           {"notify", "post", "a", "-1"},
+           {"notify", "post", "a", "18446744073709551616"},
+           {"notify", "post", "a", "1", "2"},
+           {"notify", "get"}}) {
     EXPECT_EQ(run(wrong), kWrongUsage) << testing::PrintToString(wrong);
     EXPECT_THAT(errors(), testing::Not(IsEmpty()));
   }
@@ -468,6 +477,95 @@ TEST_F(CommandLineTest, DoesNotDeleteWhatIsConfigured) {
   EXPECT_EQ(run({"defaults", "delete", "a.b", "key"}), kRefused);
   EXPECT_THAT(errors(), testing::Not(IsEmpty()));
   EXPECT_EQ(run({"defaults", "read", "a.b", "key"}), kDone);
+}
+
+TEST_F(CommandLineTest, PostsANotificationAndGetsItsState) {
+  EXPECT_EQ(run({"notify", "post", "com.orvane.test", "18446744073709551615"}), kDone);
+  EXPECT_THAT(output() + errors(), IsEmpty());
+  EXPECT_EQ(run({"notify", "post", "com.orvane.test"}), kDone);
+  EXPECT_EQ(run({"notify", "get", "com.orvane.test", "--json"}), kDone);
+  EXPECT_EQ(output(), "{\"name\":\"com.orvane.test\",\"state\":18446744073709551615}\n");
+  EXPECT_EQ(run({"notify", "post", "com.orvane.test", "0"}), kDone);
+  EXPECT_EQ(run({"notify", "get", "com.orvane.test"}), kDone);
+  EXPECT_EQ(output(),
+            "name             state\n"
+            "com.orvane.test  0\n");
+}
+
+TEST_F(CommandLineTest, APostWithoutAStateBeginsAtZero) {
+  EXPECT_EQ(run({"notify", "post", "a"}), kDone);
+  EXPECT_EQ(run({"notify", "get", "a", "--json"}), kDone);
+  EXPECT_EQ(output(), "{\"name\":\"a\",\"state\":0}\n");
+}
+
+TEST_F(CommandLineTest, SaysThatANotificationWasNeverPostedOrHasNoState) {
+  EXPECT_EQ(run({"notify", "get", "a"}), kRefused);
+  EXPECT_EQ(errors(), "twctl: nobody has posted a\n");
+  std::filesystem::create_directories(directory_.path("runtime/notifications"));
+  const std::string file = write("runtime/notifications/a", "loud");
+  EXPECT_EQ(run({"notify", "get", "a"}), kRefused);
+  EXPECT_EQ(errors(), "twctl: " + file + " holds no number of 64 bits\n");
+  std::filesystem::create_directory(directory_.path("runtime/notifications/b"));
+  EXPECT_EQ(run({"notify", "get", "b"}), kRefused);
+  EXPECT_THAT(errors(), HasSubstr("/notifications/b: "));
+  EXPECT_EQ(run({"notify", "post", "b"}), kRefused);
+  EXPECT_THAT(errors(), HasSubstr("/notifications/b: "));
+}
+
+TEST_F(CommandLineTest, RefusesWhatCannotNameANotification) {
+  for (const char* name : {"", ".", "..", "../reporting", "a/b"}) {
+    EXPECT_EQ(run({"notify", "post", name, "1"}), kRefused) << name;
+    EXPECT_EQ(errors(), "twctl: \"" + std::string(name) + "\" cannot name a notification\n");
+    EXPECT_EQ(run({"notify", "get", name}), kRefused) << name;
+  }
+}
+
+class AnnouncedDefaultsTest : public CommandLineTest {
+ protected:
+  AnnouncedDefaultsTest() { std::filesystem::create_directory(directory_.path("runtime")); }
+
+  // The names posted since the last call.
+  std::vector<std::string> posted() {
+    std::vector<std::string> names;
+    std::error_code none;
+    const std::filesystem::path notifications = directory_.path("runtime/notifications");
+    for (const auto& entry : std::filesystem::directory_iterator(notifications, none)) {
+      names.push_back(entry.path().filename().string());
+    }
+    std::filesystem::remove_all(notifications);
+    return names;
+  }
+};
+
+TEST_F(AnnouncedDefaultsTest, TellsTheDaemonOfWhatItFollows) {
+  EXPECT_EQ(run({"defaults", "write", "com.orvane.tonewerk", "device_name", "Kitchen"}), kDone);
+  EXPECT_THAT(posted(), testing::ElementsAre("com.orvane.tonewerk.reporting"));
+  EXPECT_EQ(run({"defaults", "delete", "com.orvane.tonewerk", "device_name"}), kDone);
+  EXPECT_THAT(posted(), testing::ElementsAre("com.orvane.tonewerk.reporting"));
+  EXPECT_EQ(run({"defaults", "write", "com.orvane.homedeck", "spatial-audio-accessory-feature", "1"}), kDone);
+  EXPECT_THAT(posted(), testing::ElementsAre("com.orvane.homedeck.spatial-audio-accessory-feature.changed"));
+}
+
+TEST_F(AnnouncedDefaultsTest, TellsNobodyOfWhatNobodyFollowsOrDidNotChange) {
+  EXPECT_EQ(run({"defaults", "write", "com.orvane.homedeck", "device_name", "1"}), kDone);
+  EXPECT_EQ(run({"defaults", "write", "com.orvane.metricon", "device_name", "1"}), kDone);
+  EXPECT_EQ(run({"defaults", "read", "com.orvane.homedeck"}), kDone);
+  EXPECT_EQ(run({"defaults", "delete", "com.orvane.tonewerk", "device_name"}), kRefused);
+  EXPECT_THAT(posted(), IsEmpty());
+}
+
+TEST_F(AnnouncedDefaultsTest, WithoutARuntimeDirectoryThereIsNobodyToTell) {
+  std::filesystem::remove(directory_.path("runtime"));
+  EXPECT_EQ(run({"defaults", "write", "com.orvane.tonewerk", "device_name", "Kitchen"}), kDone);
+  EXPECT_THAT(errors(), IsEmpty());
+  EXPECT_FALSE(std::filesystem::exists(directory_.path("runtime")));
+}
+
+TEST_F(AnnouncedDefaultsTest, AChangeThatCannotBeToldHoldsAndSaysSo) {
+  write("runtime/notifications", "a file in the way");
+  EXPECT_EQ(run({"defaults", "write", "com.orvane.tonewerk", "device_name", "Kitchen"}), kDone);
+  EXPECT_THAT(errors(), HasSubstr("a running daemon is not told of it: com.orvane.tonewerk.reporting: "));
+  EXPECT_EQ(run({"defaults", "read", "com.orvane.tonewerk", "device_name"}), kDone);
 }
 
 }  // namespace

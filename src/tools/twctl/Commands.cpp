@@ -34,6 +34,7 @@ int runCommandLine(int argc, const char* const* argv, Tool& tool) {
   addPowerCommand(app, tool);
   addRtcCommand(app, tool);
   addDefaultsCommand(app, tool);
+  addNotifyCommand(app, tool);
   addDiagnosticsCommands(app, tool);
   addKillCommand(app, tool);
   try {

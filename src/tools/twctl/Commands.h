@@ -22,6 +22,7 @@ void addMetricsCommand(CLI::App& app, Tool& tool);
 void addPowerCommand(CLI::App& app, Tool& tool);
 void addRtcCommand(CLI::App& app, Tool& tool);
 void addDefaultsCommand(CLI::App& app, Tool& tool);
+void addNotifyCommand(CLI::App& app, Tool& tool);
 // captures, drafts and whirlcaps.
 void addDiagnosticsCommands(CLI::App& app, Tool& tool);
 void addKillCommand(CLI::App& app, Tool& tool);

@@ -1,10 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <CLI/CLI.hpp>
+#include <filesystem>
 #include <memory>
+#include <ostream>
 #include <string>
 #include <system_error>
 
+#include "monitor/FeatureTable.h"
 #include "platform/LogCategory.h"
+#include "platform/linux/NotificationFiles.h"
 #include "platform/linux/TomlPreferenceStore.h"
 #include "platform/linux/TomlText.h"
 #include "tools/twctl/Commands.h"
@@ -53,9 +57,23 @@ void read(Tool& tool, const DefaultsOptions& options) {
   for (const ValueMap::Entry& entry : found) table.add({Value(entry.key), entry.value});
 }
 
+// A daemon that follows the preference looks at it again. Without a runtime directory none runs.
+void announce(const Tool& tool, const DefaultsOptions& options) {
+  const std::optional<std::string> notification = notificationOfPreference(options.domain, *options.key);
+  const std::string runtime = tool.directories().runtime;
+  std::error_code none;
+  if (!notification || !std::filesystem::is_directory(runtime, none)) return;
+  if (const std::error_code error = NotificationFiles(runtime + "/notifications").post(*notification)) {
+    tool.err << "twctl: done, but a running daemon is not told of it: " << *notification << ": "
+             << error.message() << '\n';
+  }
+}
+
 // What the store says of a change that it refused.
-void finish(Tool& tool, const std::error_code& error, const std::string& problem) {
-  if (error) tool.status = tool.fail(kRefused, problem.empty() ? error.message() : problem);
+void finish(Tool& tool, const DefaultsOptions& options, const std::error_code& error,
+            const std::string& problem) {
+  if (!error) return announce(tool, options);
+  tool.status = tool.fail(kRefused, problem.empty() ? error.message() : problem);
 }
 
 void write(Tool& tool, const DefaultsOptions& options) {
@@ -63,14 +81,14 @@ void write(Tool& tool, const DefaultsOptions& options) {
   const Value value = parseTomlValue(options.value).value_or(Value(options.value));
   std::string problem;
   const std::error_code error = preferences.store().write(options.domain, *options.key, value, &problem);
-  finish(tool, error, problem);
+  finish(tool, options, error, problem);
 }
 
 void remove(Tool& tool, const DefaultsOptions& options) {
   Preferences preferences(tool);
   std::string problem;
   const std::error_code error = preferences.store().remove(options.domain, *options.key, &problem);
-  finish(tool, error, problem);
+  finish(tool, options, error, problem);
 }
 
 using Action = void (*)(Tool& tool, const DefaultsOptions& options);
