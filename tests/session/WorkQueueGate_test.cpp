@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "session/WorkQueueGate.h"
 
+#include <atomic>
 #include <gtest/gtest.h>
 #include <memory>
 #include <thread>
@@ -43,6 +44,28 @@ TEST(WorkQueueGateTest, NothingComesThroughOnceItIsClosed) {
   EXPECT_FALSE(gate.run([&] { isDone = true; }));
   EXPECT_EQ(queue.runAll(), 0U);
   EXPECT_FALSE(isDone);
+}
+
+TEST(WorkQueueGateTest, WhatIsTakenWhileTheQueueEndsRunsAndWhatIsNotDoesNot) {
+  for (int round = 0; round < 20; ++round) {
+    auto queue = std::make_unique<ManualSerialQueue>("work");
+    WorkQueueGate gate(*queue);
+    std::atomic<int> taken = 0;
+    std::atomic<int> ran = 0;
+    const auto answer = [&] {
+      for (int n = 0; n < 200; ++n) {
+        if (gate.run([&ran] { ++ran; })) ++taken;
+      }
+    };
+    std::thread one(answer);
+    std::thread other(answer);
+    gate.close();
+    queue.reset();
+    one.join();
+    other.join();
+    EXPECT_EQ(taken, ran);
+    EXPECT_FALSE(gate.run([] {}));
+  }
 }
 
 class ContextGateTest : public ReportingTest {};
