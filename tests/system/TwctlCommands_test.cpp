@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // The command-line tool as a program, beside a running daemon.
+#include <filesystem>
 #include <fstream>
 #include <nlohmann/json.hpp>
 #include <sstream>
@@ -72,12 +73,12 @@ class TwctlTest : public RunningDaemonTest {
 TEST_F(TwctlTest, EveryCommandHelps) {
   EXPECT_EQ(run({"--help"}), kDone);
   for (const std::string name :
-       {"list", "validate", "send", "replay", "events", "power", "defaults", "notify", "kill"}) {
+       {"list", "validate", "send", "replay", "events", "power", "defaults", "notify", "channels", "kill"}) {
     SCOPED_TRACE(name);
     EXPECT_THAT(output, HasSubstr("\n  " + name + " "));
   }
   for (const std::string name :
-       {"list", "validate", "send", "replay", "events", "power", "defaults", "notify", "kill"}) {
+       {"list", "validate", "send", "replay", "events", "power", "defaults", "notify", "channels", "kill"}) {
     SCOPED_TRACE(name);
     EXPECT_EQ(run({name, "--help"}), kDone);
     EXPECT_THAT(output, AllOf(HasSubstr("Usage: twctl " + name), HasSubstr("--json")));
@@ -282,6 +283,39 @@ TEST_F(TwctlTest, EventsAreFollowedAsTheyCome) {
       return seen.size() == 2 * at && !seen.back().is_discarded();
     })) << textOfFile(directory.path("errors"));
   }
+}
+
+TEST_F(TwctlTest, ChannelsAreShownAsTheyAreAndAsTheyChange) {
+  const auto publish = [this](int value) {
+    const std::string channels = daemon.path(DaemonProcess::kRuntime) + "/channels";
+    std::filesystem::create_directories(channels);
+    std::ofstream(channels + "/.new")
+        << json{{"driver", "Amp"},
+                {"channels", {{{"group", "Tx"}, {"name", "n"}, {"format", "simple"}, {"value", value}}}}};
+    std::filesystem::rename(channels + "/.new", channels + "/amp.json");
+  };
+  publish(1);
+  EXPECT_EQ(run({"channels", "--json", "--driver", "Amp"}), kDone) << errors;
+  EXPECT_THAT(objects(output),
+              ElementsAre(json{
+                  {"driver", "Amp"}, {"group", "Tx"}, {"name", "n"}, {"format", "simple"}, {"value", 1}}));
+
+  const TemporaryDirectory directory;
+  ChildProcess watcher;
+  ASSERT_TRUE(watcher.start(command({"channels", "--json", "--driver", "Amp", "--watch", "0.05"}),
+                            directory.path("output"), directory.path("errors")));
+  int value = 1;
+  // The watcher may begin at any of these.
+  EXPECT_TRUE(waitUntil([&] {
+    publish(value += 1000);
+    const auto seen = objects(textOfFile(directory.path("output")));
+    return seen.size() >= 3 && !seen.back().is_discarded();
+  })) << textOfFile(directory.path("errors"));
+  const auto first = objects(textOfFile(directory.path("output"))).front();
+  EXPECT_EQ(first.at("name"), "n");
+  EXPECT_GE(first.at("value").get<int>(), 1000);
+  EXPECT_EQ(first.at("value").get<int>() % 1000, 0);
+  EXPECT_GT(first.at("at").get<double>(), 1.7e9);
 }
 
 TEST_F(TwctlTest, PreferencesAreReadWrittenAndDeleted) {

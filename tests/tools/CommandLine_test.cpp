@@ -71,7 +71,7 @@ class CommandLineTest : public testing::Test {
 
 TEST_F(CommandLineTest, HelpsWithEveryCommand) {
   for (const char* name : {"list", "validate", "send", "replay", "events", "metrics", "power", "rtc",
-                           "defaults", "notify", "captures", "drafts", "whirlcaps", "kill"}) {
+                           "defaults", "notify", "captures", "drafts", "whirlcaps", "channels", "kill"}) {
     EXPECT_EQ(run({name, "--help"}), kDone);
     EXPECT_THAT(output(), HasSubstr("--json")) << name;
     EXPECT_THAT(errors(), IsEmpty());
@@ -109,6 +109,7 @@ TEST_F(CommandLineTest, CallsWrongUsageWrong) {
            {"metrics", "--since", "then"},
            {"power", "more"},
            {"defaults"},
+           {"channels", "more"},
            {"defaults", "write", "a.b", "c"},
            {"notify"},
            {"notify", "post"},

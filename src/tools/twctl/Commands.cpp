@@ -36,6 +36,7 @@ int runCommandLine(int argc, const char* const* argv, Tool& tool) {
   addDefaultsCommand(app, tool);
   addNotifyCommand(app, tool);
   addDiagnosticsCommands(app, tool);
+  addChannelsCommand(app, tool);
   addKillCommand(app, tool);
   try {
     app.parse(argc, argv);

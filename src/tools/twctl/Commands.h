@@ -25,6 +25,7 @@ void addDefaultsCommand(CLI::App& app, Tool& tool);
 void addNotifyCommand(CLI::App& app, Tool& tool);
 // captures, drafts and whirlcaps.
 void addDiagnosticsCommands(CLI::App& app, Tool& tool);
+void addChannelsCommand(CLI::App& app, Tool& tool);
 void addKillCommand(CLI::App& app, Tool& tool);
 
 // A command with the options that all have.

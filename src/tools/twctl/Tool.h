@@ -27,7 +27,8 @@ struct Tool {
   const JsonService& json;
   bool asJson = false;      // --json
   bool systemWide = false;  // --system
-  int status = kDone;       // of the command that ran
+  bool outIsTerminal = false;
+  int status = kDone;  // of the command that ran
 
   // Prints "twctl: <problem>" and returns `failure`.
   int fail(ExitStatus failure, std::string_view problem) const;

@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <iostream>
+#include <unistd.h>
 
 #include "platform/linux/NlohmannJsonService.h"
 #include "tools/twctl/Commands.h"
@@ -7,5 +8,6 @@
 int main(int argc, char** argv) {
   const tonewerk::NlohmannJsonService json;
   tonewerk::Tool tool{std::cout, std::cerr, json};
+  tool.outIsTerminal = isatty(STDOUT_FILENO) != 0;
   return tonewerk::runCommandLine(argc, argv, tool);
 }
