@@ -6,6 +6,7 @@
 #include <utility>
 
 #include "tools/twctl/ChannelText.h"
+#include "tools/twctl/PrintableText.h"
 #include "tools/twctl/Table.h"
 #include "tools/twctl/Tool.h"
 
@@ -20,7 +21,7 @@ bool fitsPattern(const std::optional<std::string>& pattern, const std::optional<
 }
 
 Table::Cell shown(const std::optional<std::string_view>& text) {
-  return Value(forTerminal(text.value_or("")));
+  return Value(printable(std::string(text.value_or(""))));
 }
 
 }  // namespace

@@ -7,6 +7,7 @@
 #include <optional>
 
 #include "platform/Chanmeter.h"
+#include "tools/twctl/PrintableText.h"
 
 namespace tonewerk {
 namespace {
@@ -55,8 +56,9 @@ std::string stateText(const ChanmeterSample& sample) {
   std::string list;
   for (std::int32_t index = 0; index < sample.stateCount(); ++index) {
     if (sample.stateResidency(index) == 0 && sample.stateInTransitions(index) == 0) continue;
-    append(list, forTerminal(sample.stateName(index)) + ": " + std::to_string(sample.stateResidency(index)) +
-                     " (" + Value(std::round(sample.stateDutyCycle(index) * 1000) / 10).text() + " %)");
+    append(list, printable(std::string(sample.stateName(index))) + ": " +
+                     std::to_string(sample.stateResidency(index)) + " (" +
+                     Value(std::round(sample.stateDutyCycle(index) * 1000) / 10).text() + " %)");
   }
   return list.empty() ? "-" : list;
 }
@@ -135,19 +137,6 @@ bool isChanged(const ChanmeterSample& sample) {
     if (sample.stateResidency(index) != 0 || sample.stateInTransitions(index) != 0) return true;
   }
   return false;
-}
-
-std::string forTerminal(std::string_view text) {
-  std::string shown;
-  for (std::size_t at = 0; at < text.size(); ++at) {
-    const auto byte = static_cast<unsigned char>(text[at]);
-    const bool isLatinControl = byte == 0xC2 && at + 1 < text.size() &&
-                                static_cast<unsigned char>(text[at + 1]) < 0xA0;  // U+0080 to U+009F
-    const bool isControl = byte < 0x20 || byte == 0x7F || isLatinControl;
-    shown += isControl ? '?' : text[at];
-    if (isLatinControl) ++at;
-  }
-  return shown;
 }
 
 }  // namespace tonewerk

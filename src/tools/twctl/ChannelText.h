@@ -2,7 +2,6 @@
 #pragma once
 
 #include <string>
-#include <string_view>
 
 #include "values/Value.h"
 
@@ -20,8 +19,5 @@ ValueMap channelFields(const ChanmeterSample& sample);
 
 // Whether anything happened, if the sample is a change.
 bool isChanged(const ChanmeterSample& sample);
-
-// Names are whatever somebody published: with a '?' for each control character, which a terminal might obey.
-std::string forTerminal(std::string_view text);
 
 }  // namespace tonewerk

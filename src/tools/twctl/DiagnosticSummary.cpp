@@ -4,21 +4,12 @@
 #include <initializer_list>
 #include <nlohmann/json.hpp>
 
+#include "tools/twctl/PrintableText.h"
+
 namespace tonewerk {
 namespace {
 
 using Json = nlohmann::ordered_json;
-
-// Without control characters, those that UTF-8 writes in two bytes included.
-std::string printable(std::string text) {
-  for (std::size_t at = 0; at < text.size(); ++at) {
-    const auto byte = static_cast<unsigned char>(text[at]);
-    const auto next = at + 1 < text.size() ? static_cast<unsigned char>(text[at + 1]) : 0;
-    if (byte == 0xC2 && next >= 0x80 && next < 0xA0) text.replace(at, 2, "?");
-    if (byte < ' ' || byte == 0x7F) text[at] = '?';
-  }
-  return text;
-}
 
 // Null when a key of the path is not there.
 const Json* find(const Json& root, std::initializer_list<const char*> path) {
