@@ -1,0 +1,64 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Reads the input as a file of driver channels; what was read answers every question about it, and takes a
+// difference to itself.
+#include <cstddef>
+#include <cstdint>
+#include <cstdlib>
+#include <memory>
+#include <string_view>
+
+#include "platform/chanmeter/ChanmeterDifference.h"
+#include "platform/chanmeter/ChanmeterRecordSample.h"
+#include "platform/linux/ChannelFile.h"
+#include "platform/linux/Utf8.h"
+
+namespace tonewerk {
+namespace {
+
+void expect(bool condition) {
+  if (!condition) std::abort();
+}
+
+void ask(const ChanmeterSample& sample) {
+  expect(isUtf8(sample.driverName().value()) && isUtf8(sample.group().value()));
+  expect(isUtf8(sample.channelName().value()) && isUtf8(sample.unitLabel().value_or("")));
+  for (std::int32_t index = -1; index <= sample.histogramBucketCount(); ++index) {
+    std::int64_t lower = 0;
+    std::int64_t upper = 0;
+    const bool isThere = index >= 0 && index < sample.histogramBucketCount();
+    expect(isThere || sample.histogramBucketBounds(index, lower, upper) != 0);
+    expect(isThere || sample.histogramBucketHits(index) == 0);
+  }
+  for (std::int32_t index = -1; index <= sample.stateCount(); ++index)
+    expect(isUtf8(sample.stateName(index)));
+}
+
+// Unless something is counted below zero, nothing changes from a time to the same time.
+void expectNoChange(const ChanmeterRecords& records) {
+  const ChanmeterRecords changes = chanmeterDifference(records, records);
+  expect(changes.size() == records.size());
+  for (const auto& change : changes) {
+    if (change->format == kChanmeterFormatSimple) expect(change->value == 0);
+    if (change->format != kChanmeterFormatState) continue;
+    for (const ChanmeterState& state : change->states) expect(state.residency == 0 && state.dutyCycle == 0);
+  }
+}
+
+void read(std::string_view text) {
+  ChannelFileProblem problem;
+  const std::optional<ChannelFile> file = ChannelFile::parse(text, problem);
+  expect(file.has_value() == (problem.code == 0));
+  expect(isUtf8(problem.text) && problem.text.size() < 1000);
+  if (!file) return;
+  for (const auto& record : file->records) ask(ChanmeterRecordSample(record));
+  expectNoChange(file->records);
+}
+
+}  // namespace
+}  // namespace tonewerk
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+  tonewerk::read({reinterpret_cast<const char*>(data), size});
+  return 0;
+}
