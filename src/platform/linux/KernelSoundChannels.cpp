@@ -37,6 +37,10 @@ std::set<int> numbersIn(const std::string& directory, std::string_view prefix, s
   return numbers;
 }
 
+std::string numbered(const char* name, int number) { return name + std::to_string(number); }
+
+std::string pathIn(const std::string& directory, const std::string& name) { return directory + "/" + name; }
+
 std::optional<std::string> lineOf(const std::string& path) {
   std::string text;
   if (readTextFile(path, text)) return std::nullopt;
@@ -71,6 +75,7 @@ ChanmeterRecord stateRecord(ChanmeterKey key, const char* name, std::vector<Chan
 
 std::vector<ChanmeterState> statesOf(const PcmStatus& status) {
   std::vector<ChanmeterState> states;
+  states.reserve(kPcmStates.size() + 1);
   for (const char* name : kPcmStates) states.push_back({.name = name});
   auto present = std::find_if(states.begin(), states.end(),
                               [&status](const ChanmeterState& state) { return state.name == status.state; });
@@ -96,12 +101,12 @@ void KernelSoundChannels::read(const ChannelChoice& choice, ChanmeterRecords& re
                                std::optional<ChanmeterError>& error) {
   Reading reading{choice, records, error};
   for (const int number : cardNumbers()) {
-    const std::string card = "/card" + std::to_string(number);
+    const std::string card = numbered("card", number);
     const std::string driver = identifierOf(number);
     if (!choice.concerns(driver)) continue;
-    readPower(reading, driver, devices_ + card + "/device/power");
-    readSubstreams(reading, driver, cards_ + card, 'p');
-    readSubstreams(reading, driver, cards_ + card, 'c');
+    readPower(reading, driver, pathIn(pathIn(devices_, card), "device/power"));
+    readSubstreams(reading, driver, pathIn(cards_, card), 'p');
+    readSubstreams(reading, driver, pathIn(cards_, card), 'c');
   }
 }
 
@@ -112,9 +117,9 @@ std::set<int> KernelSoundChannels::cardNumbers() const {
 }
 
 std::string KernelSoundChannels::identifierOf(int card) const {
-  const std::string name = "card" + std::to_string(card);
-  for (const std::string& directory : {cards_, devices_}) {
-    const std::optional<std::string> line = lineOf(directory + "/" + name + "/id");
+  std::string name = numbered("card", card);
+  for (const std::string* directory : {&cards_, &devices_}) {
+    const std::optional<std::string> line = lineOf(pathIn(pathIn(*directory, name), "id"));
     if (line && !line->empty()) return *line;
   }
   return name;
@@ -143,15 +148,17 @@ void KernelSoundChannels::readSubstreams(Reading& reading, const std::string& dr
                                          char direction) {
   const char* group = direction == 'p' ? "Tx" : "Rx";
   for (const int device : numbersIn(card, "pcm", {&direction, 1})) {
-    const std::string pcm = "pcm" + std::to_string(device);
-    const std::string directory = card + "/" + pcm + direction;
+    const std::string pcm = numbered("pcm", device);
+    std::string directory = pathIn(card, pcm);
+    directory += direction;
     for (const int substream : numbersIn(directory, "sub")) {
-      const std::string sub = "sub" + std::to_string(substream);
-      const ChanmeterKey key{.driver = driver, .group = group, .subGroup = pcm + " " + sub};
+      const std::string sub = numbered("sub", substream);
+      ChanmeterKey key{.driver = driver, .group = group, .subGroup = pcm};
+      key.subGroup->append(" ").append(sub);
       if (++reading.substreams > kMostSubstreams) {
         return complain(reading, kChannelsTooMany, directory, "has one substream too many");
       }
-      readSubstream(reading, key, directory + "/" + sub);
+      readSubstream(reading, std::move(key), pathIn(directory, sub));
     }
   }
 }
