@@ -26,7 +26,7 @@ constexpr std::uint32_t kFileEvents = IN_CLOSE_WRITE | IN_MOVED_TO | IN_CREATE;
 constexpr std::uint32_t kSelfEvents = IN_DELETE_SELF | IN_MOVE_SELF;
 constexpr std::uint32_t kEntryEvents = IN_CREATE | IN_MOVED_TO | IN_MOVED_FROM | IN_DELETE;
 
-constexpr std::size_t kBufferBytes = 16 * 1024;
+constexpr std::size_t kBufferBytes = std::size_t{16} << 10;
 
 bool holdsSomething(const std::string& path) {
   struct stat status {};
