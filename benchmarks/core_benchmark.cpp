@@ -47,6 +47,8 @@ class QuietLog final : public Log {
 class SilentTracePoints final : public TracePoints {
  public:
   void emit(std::uint32_t) override {}
+  void beginInterval(const char*, std::int64_t) override {}
+  void endInterval(const char*, std::int64_t) override {}
 };
 
 class RunningClock final : public Clock {

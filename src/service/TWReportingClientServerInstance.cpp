@@ -51,7 +51,7 @@ void TWReportingClientServerInstance::onWorkQueue(ServiceRequest request, Body b
 
 void TWReportingClientServerInstance::createReportingSession(ReporterID reporterID, ServiceRequest request) {
   onWorkQueue(std::move(request), [reporterID](auto& self, auto&, const Reply& reply) {
-    emitTracePoint(TWReportingTracePoint::kRequestCreate);
+    const TracedRequest traced(TWReportingTracePoint::kRequestCreate, reporterID);
     debugLog(category(), "creating session for reporter %lli", reporterID);
     SessionMap& sessions = self.clientReportingSessionMap_;
     if (sessions.size() >= kMostSessions && !sessions.contains(reporterID)) {
@@ -127,7 +127,7 @@ void TWReportingClientServerInstance::setConfiguration(ValueMap configuration, R
 void TWReportingClientServerInstance::startReportingSessionForID(ReporterID reporterID,
                                                                  ServiceRequest request) {
   onWorkQueue(std::move(request), [reporterID](auto& self, auto& delegate, const Reply& reply) {
-    emitTracePoint(TWReportingTracePoint::kRequestStart);
+    const TracedRequest traced(TWReportingTracePoint::kRequestStart, reporterID);
     debugLog(category(), "starting session for reporter %lli", reporterID);
     const Session session = self.ownSession(reporterID);
     if (session == nullptr) return reply(std::nullopt, true);
@@ -160,7 +160,7 @@ void TWReportingClientServerInstance::sendMessage(ValueMap message, AudioEventCa
   onWorkQueue(std::move(request),
               [message = std::move(message), messageCategory, type, reporterIDs = std::move(reporterIDs)](
                   auto&, auto& delegate, const Reply& reply) mutable {
-                emitTracePoint(TWReportingTracePoint::kRequestSend);
+                const TracedRequest traced(TWReportingTracePoint::kRequestSend);
                 debugLog(category(), "sending message for reporter %@", reporterIDs);
                 if (!delegate.isReportingEnabled()) {
                   return reply(ReplyError{std::string(kReportingErrorDomain), kReportingDisabled, ""});
@@ -180,7 +180,7 @@ void TWReportingClientServerInstance::sendMessage(ValueMap message, AudioEventCa
 void TWReportingClientServerInstance::stopReportingSessionForID(ReporterID reporterID,
                                                                 ServiceRequest request) {
   onWorkQueue(std::move(request), [reporterID](auto& self, auto& delegate, const Reply& reply) {
-    emitTracePoint(TWReportingTracePoint::kRequestStop);
+    const TracedRequest traced(TWReportingTracePoint::kRequestStop, reporterID);
     debugLog(category(), "stopping session for reporter %lli", reporterID);
     if (reporterID == 0) return reply(std::nullopt, true);
     const Session session = self.ownSession(reporterID);
@@ -202,7 +202,7 @@ void TWReportingClientServerInstance::stopReportingSessionForID(ReporterID repor
 
 void TWReportingClientServerInstance::destroyReportingSession(ReporterID reporterID, ServiceRequest request) {
   onWorkQueue(std::move(request), [reporterID](auto& self, auto& delegate, const Reply& reply) {
-    emitTracePoint(TWReportingTracePoint::kRequestDestroy);
+    const TracedRequest traced(TWReportingTracePoint::kRequestDestroy, reporterID);
     debugLog(category(), "destroying session for reporter %lli", reporterID);
     if (reporterID == 0) return reply(std::nullopt, true);
     if (const Session session = self.ownSession(reporterID)) {

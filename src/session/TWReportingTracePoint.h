@@ -22,4 +22,19 @@ enum class TWReportingTracePoint : std::uint32_t {
 // Emits it through the platform.
 void emitTracePoint(TWReportingTracePoint point);
 
+// A request's body: emits its point, and is an interval of the request's name from here to the end of the
+// scope, in which performance traces can show it.
+class TracedRequest {
+ public:
+  // `point` is a request's. `identifier` tells intervals apart: the session's, 0 for none.
+  explicit TracedRequest(TWReportingTracePoint point, std::int64_t identifier = 0);
+  TracedRequest(const TracedRequest&) = delete;
+  TracedRequest& operator=(const TracedRequest&) = delete;
+  ~TracedRequest();
+
+ private:
+  const char* const name_;
+  const std::int64_t identifier_;
+};
+
 }  // namespace tonewerk

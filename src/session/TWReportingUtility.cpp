@@ -9,10 +9,8 @@
 #include "platform/LogLine.h"
 #include "platform/ProcessInformation.h"
 #include "platform/SystemInformation.h"
-#include "platform/TracePoints.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingKeys.h"
-#include "session/TWReportingTracePoint.h"
 
 namespace tonewerk {
 namespace {
@@ -199,10 +197,6 @@ bool TWReportingUtilityIsInternalBuild() { return TWReportingContext::current().
 
 SerialQueue& TWReportingUtilityGetReportingServerQueue() {
   return TWReportingContext::current().reportingServerQueue();
-}
-
-void emitTracePoint(TWReportingTracePoint point) {
-  TWReportingContext::current().platform().tracePoints.emit(static_cast<std::uint32_t>(point));
 }
 
 LogCategory* TWReportingClientCategory() { return &TWReportingContext::current().logCategories.client; }

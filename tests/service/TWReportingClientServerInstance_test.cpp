@@ -13,6 +13,7 @@ namespace {
 using ::testing::AllOf;
 using ::testing::Contains;
 using ::testing::ElementsAre;
+using ::testing::ElementsAreArray;
 using ::testing::HasSubstr;
 using ::testing::IsEmpty;
 using ::testing::Not;
@@ -299,6 +300,23 @@ TEST_F(RequestTest, AStoppedSessionStaysInTheMap) {
   start(*client, 77);
   ask(*client, "stopReportingSessionForID", {77});
   EXPECT_NE(sessionOf(0, 77), nullptr);
+}
+
+TEST_F(RequestTest, EachRequestsBodyIsAnIntervalForPerformanceTraces) {
+  test.tracePoints.clear();
+  create(*client, 77);
+  client->request("startReportingSessionForID", {77});
+  run();
+  send({{"a", 1}}, Value(ValueArray{77}));
+  ask(*client, "stopReportingSessionForID", {77});
+  ask(*client, "destroyReportingSession", {77});
+  std::vector<std::string> expected;
+  for (const char* name : {"createReportingSession 77", "startReportingSessionForID 77", "sendMessage 0",
+                           "stopReportingSessionForID 77", "destroyReportingSession 77"}) {
+    expected.push_back(std::string("begin ") + name);
+    expected.push_back(std::string("end ") + name);
+  }
+  EXPECT_THAT(test.tracePoints.intervals(), ElementsAreArray(expected));
 }
 
 // Messages.

@@ -14,6 +14,7 @@
 
 #include "bridges/pipewire/PipeWireParams.h"
 #include "bridges/pipewire/PipeWireProfiler.h"
+#include "tonewerk/signpost.h"
 
 namespace tonewerk {
 
@@ -80,10 +81,12 @@ class BoundNode final : public BoundObject {
 
  private:
   void onInfo(const pw_node_info& info) {
+    const signpost::Interval interval("tw-pipewire.node", identifier_);
     model_.nodeDescribed(identifier_, info.state == PW_NODE_STATE_RUNNING, propertiesOf(info.props));
   }
 
   void onParameter(std::uint32_t parameter, const spa_pod& pod) {
+    const signpost::Interval interval("tw-pipewire.parameter", identifier_);
     if (parameter == SPA_PARAM_Props) {
       model_.volumeChanged(identifier_, volumeOf(pod));
     } else if (const std::optional<AudioFormat> format = formatOf(pod)) {
