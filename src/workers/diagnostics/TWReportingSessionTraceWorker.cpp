@@ -56,7 +56,10 @@ void TWReportingSessionTraceWorker::stop() {
   const auto owner = session.lock();
   if (owner == nullptr || !startedTracing_ || !traces(*owner)) return;
   startedTracing_ = false;
-  if (run_->stop()) TraceBenchfile(*owner).processTraceKolvi(run_->finalTraceURL());
+  if (!run_->stop()) return;
+  TraceBenchfile(*owner).processTraceKolvi(run_->finalTraceURL());
+  run_->abandon();
+  run_.reset();  // and with it the trace, which may be large
 }
 
 }  // namespace tonewerk

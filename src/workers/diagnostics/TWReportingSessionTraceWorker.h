@@ -38,7 +38,7 @@ class TWReportingSessionTraceWorker final : public TWReportingSessionWorkerProto
   static bool traces(const TWReportingSession& session);
 
   bool startedTracing_ = false;    // from a start request until stop(); stays after one that timed out
-  std::shared_ptr<TraceRun> run_;  // the last one
+  std::shared_ptr<TraceRun> run_;  // the last one, until its trace was processed
 };
 
 }  // namespace tonewerk

@@ -291,12 +291,16 @@ TEST_F(TWReportingSessionTraceWorkerTest, ASecondCompletionIsNotHeard) {
   EXPECT_THAT(lines(), Not(Contains("Performance Trace Completed: /traces/2")));
 }
 
-TEST_F(TWReportingSessionTraceWorkerTest, TheFinishedTraceIsKeptUntilItIsProcessed) {
+TEST_F(TWReportingSessionTraceWorkerTest, TheFinishedTraceIsKeptNoLongerThanItIsNeeded) {
   session->start();
-  session->stop();
+  EXPECT_TRUE(test.runtrace.callBack(0, Runtrace::didComplete(kTrace)));
   EXPECT_FALSE(test.runtrace.record(0).token.expired());
-  session->start();
+  session->stop();
+  session->start();  // in place of the one that ended by itself
   EXPECT_TRUE(test.runtrace.record(0).token.expired());
+  session->stop();
+  EXPECT_NE(benchfile(), "no file");
+  EXPECT_TRUE(test.runtrace.record(1).token.expired());
 }
 
 TEST_F(TWReportingSessionTraceWorkerTest, ASessionStartedAgainTracesAgain) {
