@@ -23,6 +23,7 @@
 #include "platform/linux/Directories.h"
 #include "platform/linux/LinuxChanmeter.h"
 #include "platform/linux/LinuxPlatform.h"
+#include "platform/linux/UnavailableTracing.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionMessage.h"
@@ -172,7 +173,8 @@ class Benchmark {
   MemoryEnergybook energybook_;
   MemoryDiagwire diagwire_;
   MemoryLinkReport linkReport_;
-  TWReportingContext context_{linux_.platform(metricon_, energybook_, diagwire_, linkReport_),
+  const Tracing tracing_ = makeUnavailableTracing("not measured");
+  TWReportingContext context_{linux_.platform(metricon_, energybook_, diagwire_, linkReport_, tracing_),
                               allWorkerClasses()};
   const TWReportingDriverUtility* utility_ = nullptr;
   std::optional<AllChannels> all_;

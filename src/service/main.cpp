@@ -27,6 +27,8 @@
 #include "platform/linux/StoreDiagwire.h"
 #include "platform/linux/StoreEnergybook.h"
 #include "platform/linux/StoreMetricon.h"
+#include "platform/linux/Tracing.h"
+#include "platform/linux/TracingSetup.h"
 #include "platform/linux/UnixSocketListener.h"
 #include "service/TWReportingService.h"
 #include "session/TWReportingContext.h"
@@ -69,12 +71,18 @@ class Daemon {
         diagwire_(store_, linux.clock()),
         linkReport_(store_, linux.preferences(), linux.clock(), log, TONEWERK_VERSION,
                     [] { return std::make_unique<CurlHttpClient>("twreportingd/" TONEWERK_VERSION); }),
+        tracing_(makeTracing({tracesDirectory(directories.state), signpostLibraryName(), traceReaderPath(),
+                              linux.files(), linux.json(), linux.timers(), log})),
         capsa_(linux.capsa()),
         diagnostics_(linux.diagnostics()),
         context_(platformOf(linux, directories), allWorkerClasses()),
         service_(TWReportingService::make([this] { endOnKillRequest(); })),
         listener_(std::move(socket), log) {
     diagnostics_.removeLeftovers();  // the socket is ours, so no other daemon writes there
+    const bool traces = isTracingBuiltIn() && context_.isInternalBuild();
+    if (const std::error_code error = setSignpostMark(directories.runtime, traces)) {
+      errorLog(log, "cannot tell programs about signposts: %@", error.message());
+    }
     listener_.setDelegate(*service_);
     listener_.resume();
   }
@@ -93,7 +101,7 @@ class Daemon {
 
  private:
   Platform platformOf(LinuxPlatform& linux, const Directories& directories) {
-    Platform platform = linux.platform(metricon_, energybook_, diagwire_, linkReport_);
+    Platform platform = linux.platform(metricon_, energybook_, diagwire_, linkReport_, tracing_);
     platform.logsDirectory = directories.logs;
     return platform;
   }
@@ -118,6 +126,7 @@ class Daemon {
   StoreEnergybook energybook_;
   StoreDiagwire diagwire_;
   LinuxLinkReport linkReport_;
+  Tracing tracing_;
   LinuxCapsa& capsa_;
   DiagnosticsStore& diagnostics_;
   TWReportingContext context_;

@@ -29,7 +29,7 @@
 #include "platform/linux/TimerThread.h"
 #include "platform/linux/TomlDeviceFacts.h"
 #include "platform/linux/TomlPreferenceStore.h"
-#include "platform/linux/UnavailableTracing.h"
+#include "platform/linux/Tracing.h"
 #include "platform/linux/UsdtTracePoints.h"
 
 namespace tonewerk {
@@ -47,8 +47,6 @@ std::string temporaryDirectory() {
   const std::filesystem::path path = std::filesystem::temp_directory_path(error);
   return error ? "/tmp" : path.string();
 }
-
-constexpr char kNoTracing[] = "performance tracing is not built in";
 
 }  // namespace
 
@@ -86,8 +84,6 @@ struct LinuxPlatform::Adapters {
   LinuxCommandRunner commands;
   LinuxDetachedThreads threads;
   JsonBenchfile benchfile{clock};
-  UnavailableRuntrace runtrace{kNoTracing};
-  UnavailableKolvi kolvi{kNoTracing};
 };
 
 LinuxPlatform::LinuxPlatform(const Directories& directories)
@@ -100,11 +96,12 @@ SerialQueueFactory& LinuxPlatform::queues() { return adapters_->queues; }
 TimerService& LinuxPlatform::timers() { return adapters_->timers; }
 PreferenceStore& LinuxPlatform::preferences() { return adapters_->preferences; }
 JsonService& LinuxPlatform::json() { return adapters_->json; }
+FileSystem& LinuxPlatform::files() { return adapters_->files; }
 LinuxCapsa& LinuxPlatform::capsa() { return adapters_->capsa; }
 DiagnosticsStore& LinuxPlatform::diagnostics() { return adapters_->diagnostics; }
 
 Platform LinuxPlatform::platform(Metricon& metricon, Energybook& energybook, Diagwire& diagwire,
-                                 LinkReport& linkReport) {
+                                 LinkReport& linkReport, const Tracing& tracing) {
   Adapters& a = *adapters_;
   return {.log = *a.log,
           .tracePoints = a.tracePoints,
@@ -124,8 +121,8 @@ Platform LinuxPlatform::platform(Metricon& metricon, Energybook& energybook, Dia
           .diagwire = diagwire,
           .linkReport = linkReport,
           .capsa = a.capsa,
-          .runtrace = a.runtrace,
-          .kolvi = a.kolvi,
+          .runtrace = *tracing.runtrace,
+          .kolvi = *tracing.kolvi,
           .benchfile = a.benchfile,
           .issueDrafts = a.issueDrafts,
           .whirlcaps = a.whirlcaps,

@@ -10,6 +10,7 @@ namespace tonewerk {
 class DiagnosticsStore;
 class LinuxCapsa;
 struct Directories;
+struct Tracing;
 
 // One of each adapter, and the Platform made of them. Whoever makes it lets it outlive what uses the
 // Platform.
@@ -28,12 +29,14 @@ class LinuxPlatform {
   TimerService& timers();
   PreferenceStore& preferences();
   JsonService& json();
+  FileSystem& files();
   // Whoever ends the daemon finishes these, in this order, before what uses the Platform is gone.
   LinuxCapsa& capsa();
   DiagnosticsStore& diagnostics();
 
-  // The reporting services outlive what uses the result.
-  Platform platform(Metricon& metricon, Energybook& energybook, Diagwire& diagwire, LinkReport& linkReport);
+  // The services handed in outlive what uses the result.
+  Platform platform(Metricon& metricon, Energybook& energybook, Diagwire& diagwire, LinkReport& linkReport,
+                    const Tracing& tracing);
 
  private:
   struct Adapters;

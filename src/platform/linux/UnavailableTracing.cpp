@@ -43,4 +43,8 @@ std::unique_ptr<KolviModel> UnavailableKolvi::openModel(const std::string&, std:
   return nullptr;
 }
 
+Tracing makeUnavailableTracing(const std::string& reason) {
+  return {std::make_unique<UnavailableRuntrace>(reason), std::make_unique<UnavailableKolvi>(reason)};
+}
+
 }  // namespace tonewerk

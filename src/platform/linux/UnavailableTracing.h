@@ -5,6 +5,7 @@
 
 #include "platform/Kolvi.h"
 #include "platform/Runtrace.h"
+#include "platform/linux/Tracing.h"
 
 namespace tonewerk {
 
@@ -27,5 +28,8 @@ class UnavailableKolvi final : public Kolvi {
  private:
   const std::string reason_;
 };
+
+// Both.
+Tracing makeUnavailableTracing(const std::string& reason);
 
 }  // namespace tonewerk

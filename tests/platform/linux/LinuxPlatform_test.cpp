@@ -12,6 +12,7 @@
 #include "platform/WhirlcapRequest.h"
 #include "platform/linux/DiagnosticsStore.h"
 #include "platform/linux/Directories.h"
+#include "platform/linux/UnavailableTracing.h"
 #include "support/MemoryDiagwire.h"
 #include "support/MemoryEnergybook.h"
 #include "support/MemoryLinkReport.h"
@@ -35,7 +36,8 @@ TEST(LinuxPlatformTest, LooksForEverythingWhereTheDirectoriesSay) {
   MemoryEnergybook energybook;
   MemoryDiagwire diagwire;
   MemoryLinkReport linkReport;
-  const Platform platform = linuxPlatform.platform(metricon, energybook, diagwire, linkReport);
+  const Tracing tracing = makeUnavailableTracing("none");
+  const Platform platform = linuxPlatform.platform(metricon, energybook, diagwire, linkReport, tracing);
   EXPECT_EQ(platform.deviceFacts.boolean("InternalBuild"), true);
   EXPECT_EQ(platform.preferences.read("com.orvane.test", "a"), Value(1));
   EXPECT_FALSE(platform.preferences.write("com.orvane.test", "b", 2));
@@ -45,17 +47,20 @@ TEST(LinuxPlatformTest, LooksForEverythingWhereTheDirectoriesSay) {
   EXPECT_EQ(&platform.energybook, &energybook);
   EXPECT_EQ(&platform.diagwire, &diagwire);
   EXPECT_EQ(&platform.linkReport, &linkReport);
+  EXPECT_EQ(&platform.runtrace, tracing.runtrace.get());
+  EXPECT_EQ(&platform.kolvi, tracing.kolvi.get());
 }
 
 // With the collectors that go with every item, on this system.
 TEST(LinuxPlatformTest, LeavesEvidenceOfTheSystemWithAStallTrace) {
   const TemporaryDirectory root;
   LinuxPlatform linuxPlatform({root.path("run"), root.path("state"), root.path("logs"), root.path("etc")});
+  const Tracing tracing = makeUnavailableTracing("none");
   MemoryMetricon metricon;
   MemoryEnergybook energybook;
   MemoryDiagwire diagwire;
   MemoryLinkReport linkReport;
-  const Platform platform = linuxPlatform.platform(metricon, energybook, diagwire, linkReport);
+  const Platform platform = linuxPlatform.platform(metricon, energybook, diagwire, linkReport, tracing);
   platform.log.write("com.orvane.tonewerk", "twrs", LogLevel::kError, "a line before");
   platform.whirlcaps.request("com.orvane.tonewerk", "AudioOverloads", "com.example.player", {}, {true, true});
   linuxPlatform.diagnostics().finish(std::chrono::seconds(60));

@@ -1,0 +1,58 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// tw-trace-reader: the intervals of a trace's signposts as text, for the daemon, which runs it as a process
+// of its own because damaged traces can hang or end whoever reads them.
+//
+//   name decode          the next name, from 0 on; "\\" and "\n" stand for a backslash and a newline
+//   0 1523411            an interval of name 0, in nanoseconds
+//   end                  that was all
+//
+// A trace that cannot be used gives "problem TEXT" instead, and exit status 1; wrong usage 2.
+
+#include <cstdio>
+#include <string>
+
+#include "tools/tracereader/CtfTrace.h"
+#include "tools/tracereader/SignpostPairs.h"
+
+namespace {
+
+std::string escaped(const std::string& name) {
+  std::string text;
+  for (const char c : name) {
+    if (c == '\\') {
+      text += "\\\\";
+    } else if (c == '\n') {
+      text += "\\n";
+    } else {
+      text += c;
+    }
+  }
+  return text;
+}
+
+bool print(const tonewerk::SignpostPairs& pairs) {
+  for (const std::string& name : pairs.names()) std::printf("name %s\n", escaped(name).c_str());
+  for (const auto& interval : pairs.intervals()) {
+    std::printf("%zu %llu\n", interval.name, static_cast<unsigned long long>(interval.nanoseconds));
+  }
+  std::printf("end\n");
+  return std::fflush(stdout) == 0 && std::ferror(stdout) == 0;
+}
+
+}  // namespace
+
+int main(int argc, char** argv) {
+  if (argc != 2) {
+    std::fputs("usage: tw-trace-reader DIRECTORY\n", stderr);
+    return 2;
+  }
+  tonewerk::SignpostPairs pairs;
+  const std::string problem = tonewerk::readCtfTrace(
+      argv[1], [&pairs](const tonewerk::SignpostEvent& event) { return pairs.add(event); });
+  if (!problem.empty()) {
+    std::printf("problem %s\n", escaped(problem).c_str());
+    return 1;
+  }
+  return print(pairs) ? 0 : 1;
+}

@@ -1,0 +1,30 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <string>
+#include <sys/file.h>
+#include <unistd.h>
+
+namespace tonewerk {
+
+// Makes a user's tests with a real tracer wait for one another, whatever program they are in: each user's
+// session daemon is one for the whole machine.
+class TracingTurn {
+ public:
+  TracingTurn() { EXPECT_EQ(::flock(file_, LOCK_EX), 0); }
+  TracingTurn(const TracingTurn&) = delete;
+  TracingTurn& operator=(const TracingTurn&) = delete;
+  ~TracingTurn() { ::close(file_); }
+
+ private:
+  static int open() {
+    const std::string path = "/tmp/tonewerk-tracing-tests-" + std::to_string(::getuid()) + ".lock";
+    return ::open(path.c_str(), O_RDONLY | O_CREAT | O_CLOEXEC, 0600);
+  }
+
+  const int file_ = open();
+};
+
+}  // namespace tonewerk
