@@ -58,8 +58,8 @@ class DirectoryWatcherTest : public ::testing::Test {
   }
   // A file that is there but once.
   std::string newWitness() { return "witness" + std::to_string(++witnesses); }
-  // What was told before a witness that is written now, earlier ones left out:
-  // a new file that is written may be told of twice.
+  // What was told before a witness that is written now, earlier ones left out: a new file that is written may
+  // be told of twice.
   std::vector<std::string> toldSoFar() {
     const std::string witness = newWitness();
     write(path(witness));
@@ -71,8 +71,7 @@ class DirectoryWatcherTest : public ::testing::Test {
     const std::lock_guard lock(mutex);
     return std::find(all.begin(), all.end(), what) != all.end();
   }
-  // Whether files are told of again. The first may fall into the time when
-  // everything is.
+  // Whether files are told of again. The first may fall into the time when everything is.
   bool isFollowed() {
     for (int attempt = 0; attempt < 400; ++attempt) {
       const std::string witness = newWitness();
@@ -232,8 +231,7 @@ TEST_F(WatchedDirectoryTest, AnOverflowingEventQueueTellsEverything) {
     mustHold = true;
   }
   write(path("first"));  // holds the watcher
-  // Two names in turn, since the kernel joins equal events that follow each
-  // other.
+  // Two names in turn, since the kernel joins equal events that follow each other.
   for (std::size_t count = 0; count <= most / 2 + 1000; ++count) {
     std::ofstream(path("a"), std::ios::app).close();
     std::ofstream(path("b"), std::ios::app).close();

@@ -23,16 +23,15 @@ constexpr char kName[] = "com.orvane.test.changed";
 
 // The service as processes see it that know no more than its files.
 class InotifyNotificationServiceTest : public ::testing::Test {
-protected:
-  Token registerName(const std::string &name) {
-    const auto registration =
-        service.registerHandler(name, queue, [this](Token token) {
-          {
-            const std::lock_guard lock(mutex);
-            ++told[token];
-          }
-          changed.notify_all();
-        });
+ protected:
+  Token registerName(const std::string& name) {
+    const auto registration = service.registerHandler(name, queue, [this](Token token) {
+      {
+        const std::lock_guard lock(mutex);
+        ++told[token];
+      }
+      changed.notify_all();
+    });
     EXPECT_EQ(registration.status, NotificationService::kStatusOk);
     return registration.token;
   }
@@ -42,12 +41,9 @@ protected:
   }
   bool waitForMoreThan(int before, Token token) {
     std::unique_lock lock(mutex);
-    return changed.wait_for(lock, std::chrono::seconds(20),
-                            [&] { return told[token] > before; });
+    return changed.wait_for(lock, std::chrono::seconds(20), [&] { return told[token] > before; });
   }
-  std::string file(const std::string &name = kName) const {
-    return notifications + "/" + name;
-  }
+  std::string file(const std::string& name = kName) const { return notifications + "/" + name; }
 
   TemporaryDirectory directory;
   const std::string notifications = directory.path("runtime/notifications");
@@ -55,14 +51,12 @@ protected:
   LogCategory category{log, "com.orvane.tonewerk", "twrs"};
   std::mutex mutex;
   std::condition_variable changed;
-  std::map<Token, int> told; // under the mutex
+  std::map<Token, int> told;  // under the mutex
   ThreadQueue queue{"test", QueuePriority::kUtility};
   InotifyNotificationService service{notifications, category};
 };
 
-TEST_F(InotifyNotificationServiceTest, MakesItsDirectory) {
-  EXPECT_TRUE(fs::is_directory(notifications));
-}
+TEST_F(InotifyNotificationServiceTest, MakesItsDirectory) { EXPECT_TRUE(fs::is_directory(notifications)); }
 
 TEST_F(InotifyNotificationServiceTest, AFileThatSomebodyWritesIsAPost) {
   const Token token = registerName(kName);
@@ -71,8 +65,7 @@ TEST_F(InotifyNotificationServiceTest, AFileThatSomebodyWritesIsAPost) {
   EXPECT_EQ(service.state(token), 1U);
 }
 
-TEST_F(InotifyNotificationServiceTest,
-       AFileThatIsLinkedOrRenamedIntoPlaceIsAPost) {
+TEST_F(InotifyNotificationServiceTest, AFileThatIsLinkedOrRenamedIntoPlaceIsAPost) {
   const Token token = registerName(kName);
   std::ofstream(directory.path("made")) << "7\n";
   fs::create_hard_link(directory.path("made"), file());
@@ -85,8 +78,7 @@ TEST_F(InotifyNotificationServiceTest,
   EXPECT_EQ(service.state(token), 8U);
 }
 
-TEST_F(InotifyNotificationServiceTest,
-       AFileThatIsNoNumberOrTooLargeHasNoState) {
+TEST_F(InotifyNotificationServiceTest, AFileThatIsNoNumberOrTooLargeHasNoState) {
   const Token token = registerName(kName);
   std::ofstream(file()) << "loud";
   EXPECT_EQ(service.state(token), std::nullopt);
@@ -104,32 +96,28 @@ TEST_F(InotifyNotificationServiceTest, ARemovedFilesStateIsZero) {
   EXPECT_EQ(service.state(token), 0U);
 }
 
-TEST_F(InotifyNotificationServiceTest,
-       EveryNameIsToldWhenTheDirectoryIsReplaced) {
+TEST_F(InotifyNotificationServiceTest, EveryNameIsToldWhenTheDirectoryIsReplaced) {
   const Token first = registerName(kName);
   const Token second = registerName("com.orvane.test.other");
   fs::rename(notifications, directory.path("away"));
   EXPECT_TRUE(waitForMoreThan(0, first));
   EXPECT_TRUE(waitForMoreThan(0, second));
   const int before = count(first);
-  EXPECT_FALSE(service.post(kName)); // makes the directory anew
+  EXPECT_FALSE(service.post(kName));  // makes the directory anew
   EXPECT_TRUE(waitForMoreThan(before, first));
   EXPECT_EQ(service.state(first), 0U);
 }
 
-TEST_F(InotifyNotificationServiceTest,
-       ManyFilesThatNobodyRegisteredForChangeNothing) {
+TEST_F(InotifyNotificationServiceTest, ManyFilesThatNobodyRegisteredForChangeNothing) {
   const Token token = registerName(kName);
-  for (int at = 0; at < 200; ++at)
-    std::ofstream(file("other-" + std::to_string(at))) << at;
+  for (int at = 0; at < 200; ++at) std::ofstream(file("other-" + std::to_string(at))) << at;
   EXPECT_FALSE(service.post(kName));
   EXPECT_TRUE(waitForMoreThan(0, token));
   queue.drain();
   EXPECT_EQ(count(token), 1);
 }
 
-TEST(InotifyNotificationServiceWithoutDirectoryTest,
-     WorksOnceThereIsADirectory) {
+TEST(InotifyNotificationServiceWithoutDirectoryTest, WorksOnceThereIsADirectory) {
   const TemporaryDirectory directory;
   std::ofstream(directory.path("runtime")) << "a file in the way";
   MemoryLog log;
@@ -138,8 +126,7 @@ TEST(InotifyNotificationServiceWithoutDirectoryTest,
   std::mutex mutex;
   std::condition_variable changed;
   bool isTold = false;
-  InotifyNotificationService service(directory.path("runtime/notifications"),
-                                     category);
+  InotifyNotificationService service(directory.path("runtime/notifications"), category);
   const auto registration = service.registerHandler(kName, queue, [&](Token) {
     {
       const std::lock_guard lock(mutex);
@@ -154,9 +141,8 @@ TEST(InotifyNotificationServiceWithoutDirectoryTest,
   EXPECT_FALSE(service.post(kName));
   EXPECT_EQ(service.state(registration.token), 0U);
   std::unique_lock lock(mutex);
-  EXPECT_TRUE(
-      changed.wait_for(lock, std::chrono::seconds(20), [&] { return isTold; }));
+  EXPECT_TRUE(changed.wait_for(lock, std::chrono::seconds(20), [&] { return isTold; }));
 }
 
-} // namespace
-} // namespace tonewerk
+}  // namespace
+}  // namespace tonewerk

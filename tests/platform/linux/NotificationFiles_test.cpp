@@ -17,19 +17,16 @@ namespace {
 using ::testing::UnorderedElementsAre;
 
 class NotificationFilesTest : public ::testing::Test {
-protected:
-  void write(const std::string &name, const std::string &text) {
+ protected:
+  void write(const std::string& name, const std::string& text) {
     std::filesystem::create_directories(files.directory());
     std::ofstream(files.directory() + "/" + name) << text;
   }
   // The state, or what is wrong with it.
-  std::optional<std::uint64_t> state(const std::string &name) {
-    return files.state(name, error);
-  }
+  std::optional<std::uint64_t> state(const std::string& name) { return files.state(name, error); }
   std::vector<std::string> names() const {
     std::vector<std::string> found;
-    for (const auto &entry :
-         std::filesystem::directory_iterator(files.directory())) {
+    for (const auto& entry : std::filesystem::directory_iterator(files.directory())) {
       found.push_back(entry.path().filename().string());
     }
     return found;
@@ -41,13 +38,12 @@ protected:
 };
 
 TEST_F(NotificationFilesTest, AStateIsADecimalNumberWithSpacesAroundIt) {
-  for (const auto &[text, expected] :
-       std::vector<std::pair<std::string, std::uint64_t>>{
-           {"0", 0},
-           {"1\n", 1},
-           {" \t007\r\n\n", 7},
-           {"18446744073709551615", UINT64_MAX},
-           {std::string(63, ' ') + "5", 5}}) {
+  for (const auto& [text, expected] :
+       std::vector<std::pair<std::string, std::uint64_t>>{{"0", 0},
+                                                          {"1\n", 1},
+                                                          {" \t007\r\n\n", 7},
+                                                          {"18446744073709551615", UINT64_MAX},
+                                                          {std::string(63, ' ') + "5", 5}}) {
     write("a", text);
     EXPECT_EQ(state("a"), expected) << text;
     EXPECT_FALSE(error);
@@ -55,12 +51,10 @@ TEST_F(NotificationFilesTest, AStateIsADecimalNumberWithSpacesAroundIt) {
 }
 
 TEST_F(NotificationFilesTest, WhatIsNoNumberOrTooMuchHasNoState) {
-  for (const std::string &text :
-       {std::string(), std::string("\n"), std::string("one"), std::string("-1"),
-        std::string("+1"), std::string("0x1"), std::string("1.0"),
-        std::string("1 2"), std::string("1\0", 2),
-        std::string("18446744073709551616"), std::string(64, ' ') + "5",
-        std::string(1 << 20, '1')}) {
+  for (const std::string& text :
+       {std::string(), std::string("\n"), std::string("one"), std::string("-1"), std::string("+1"),
+        std::string("0x1"), std::string("1.0"), std::string("1 2"), std::string("1\0", 2),
+        std::string("18446744073709551616"), std::string(64, ' ') + "5", std::string(1 << 20, '1')}) {
     write("a", text);
     EXPECT_EQ(state("a"), std::nullopt) << text.substr(0, 70);
     EXPECT_EQ(error, std::errc::result_out_of_range) << text.substr(0, 70);
@@ -94,9 +88,8 @@ TEST_F(NotificationFilesTest, APostKeepsWhateverItsFileHolds) {
 }
 
 TEST_F(NotificationFilesTest, NamesThatAreNoFileNamesAreRefused) {
-  for (const std::string &name :
-       {std::string(), std::string("."), std::string(".."), std::string("../b"),
-        std::string("/b"), std::string("a\0b", 3), std::string(256, 'a')}) {
+  for (const std::string& name : {std::string(), std::string("."), std::string(".."), std::string("../b"),
+                                  std::string("/b"), std::string("a\0b", 3), std::string(256, 'a')}) {
     EXPECT_EQ(files.post(name), std::errc::invalid_argument);
     EXPECT_EQ(files.post(name, 1), std::errc::invalid_argument);
     EXPECT_EQ(state(name), std::nullopt);
@@ -108,12 +101,11 @@ TEST_F(NotificationFilesTest, NamesThatAreNoFileNamesAreRefused) {
 TEST_F(NotificationFilesTest, ALinkDoesNotLeadOutOfTheDirectory) {
   write("x", "");
   std::ofstream(directory.path("outside")) << "41\n";
-  std::filesystem::create_symlink(directory.path("outside"),
-                                  files.directory() + "/a");
+  std::filesystem::create_symlink(directory.path("outside"), files.directory() + "/a");
   EXPECT_EQ(state("a"), std::nullopt);
   EXPECT_EQ(error, std::errc::too_many_symbolic_link_levels);
   EXPECT_EQ(files.post("a"), std::errc::too_many_symbolic_link_levels);
-  EXPECT_FALSE(files.post("a", 1)); // takes the link's place
+  EXPECT_FALSE(files.post("a", 1));  // takes the link's place
   EXPECT_EQ(state("a"), 1U);
   std::string outside;
   std::getline(std::ifstream(directory.path("outside")), outside);
@@ -140,5 +132,5 @@ TEST_F(NotificationFilesTest, AFileInTheDirectorysPlaceIsAFailure) {
   EXPECT_EQ(state("b"), std::nullopt);
 }
 
-} // namespace
-} // namespace tonewerk
+}  // namespace
+}  // namespace tonewerk
