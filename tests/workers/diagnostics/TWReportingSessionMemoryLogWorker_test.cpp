@@ -272,6 +272,15 @@ TEST_F(TWReportingSessionMemoryLogWorkerTest, WithoutALineEndABlockIsExactly512B
                                           "WIRED LOG BLOCK 3\n" + text.substr(0, 76)));
 }
 
+TEST_F(TWReportingSessionMemoryLogWorkerTest, AfterTheLastLineEndBlocksAreExactly512BytesAgain) {
+  const std::string lines = std::string(99, 'x') + "\n" + std::string(599, 'y') + "\n";
+  const std::string rest(1100, 'z');
+  EXPECT_THAT(
+      blocksOf(lines + rest),
+      ElementsAre("WIRED LOG BLOCK 1\n" + lines, "WIRED LOG BLOCK 2\n" + rest.substr(0, 512),
+                  "WIRED LOG BLOCK 3\n" + rest.substr(0, 512), "WIRED LOG BLOCK 4\n" + rest.substr(0, 76)));
+}
+
 TEST_F(TWReportingSessionMemoryLogWorkerTest, LessThan512BytesAreOneBlock) {
   const std::string text = std::string(100, 'x') + "\n" + std::string(410, 'y');
   ASSERT_EQ(text.size(), 511U);
