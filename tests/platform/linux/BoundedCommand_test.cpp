@@ -4,10 +4,13 @@
 #include <cerrno>
 #include <csignal>
 #include <gmock/gmock.h>
+#include <poll.h>
 #include <string>
+#include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include "platform/linux/FileDescriptor.h"
 #include "platform/linux/TextFile.h"
 #include "support/TemporaryDirectory.h"
 
@@ -40,8 +43,10 @@ bool isRunning(const std::string& process) {
 
 // Its ending was brought about before; it may take the kernel a moment.
 bool ends(const std::string& process) {
-  for (int attempt = 0; attempt < 1000 && isRunning(process); ++attempt) usleep(10'000);
-  return !isRunning(process);
+  const FileDescriptor watch(static_cast<int>(syscall(SYS_pidfd_open, std::stoi(process), 0)));
+  if (!watch) return errno == ESRCH;
+  pollfd waited{watch.get(), POLLIN, 0};
+  return poll(&waited, 1, 30'000) == 1;
 }
 
 TEST(BoundedCommandTest, GivesTheOutputAndTheStatus) {
@@ -127,7 +132,11 @@ TEST(BoundedCommandTest, DoesNotWaitForAGrandchildThatHoldsThePipe) {
 }
 
 TEST(BoundedCommandTest, DoesNotWaitForAGrandchildThatLeftTheProcessGroup) {
-  const BoundedCommand::Result result = shell("setsid sh -c 'echo $$; exec sleep 1000' & sleep 0.3");
+  // The shell ends when the grandchild has left and said who it is.
+  const TemporaryDirectory directory;
+  const std::string fifo = directory.path("left");
+  const BoundedCommand::Result result = shell("mkfifo " + fifo + "; setsid sh -c 'echo $$; echo > " + fifo +
+                                              "; exec sleep 1000' & read line < " + fifo);
   EXPECT_EQ(result.end, End::kExited);
   const std::string process = result.output.substr(0, result.output.find('\n'));
   ASSERT_NE(process, "");
