@@ -101,15 +101,16 @@ ChannelFileProblem PublishedChannels::refresh(const std::string& path, File& fil
   struct stat status {};
   if (stat(path.c_str(), &status) != 0) {
     const std::error_code error = lastSystemError();
-    file.stamp.reset();
-    file.text.clear();
-    file.records.clear();
+    file.letGo();
     // Gone since its name was read, or a link to nowhere.
     return error == std::errc::no_such_file_or_directory ? ChannelFileProblem() : problemOf(error);
   }
   const auto size = static_cast<std::size_t>(status.st_size);
   if (S_ISREG(status.st_mode) && size <= kMostFileBytes) sums.bytes += size;
-  if (sums.bytes > kMostBytes) return pastBound(kMostBytes, "bytes");
+  if (sums.bytes > kMostBytes) {
+    file.letGo();  // it may have been read when there were fewer files before it
+    return pastBound(kMostBytes, "bytes");
+  }
 
   if (!file.stamp || FileStamp::of(status) != *file.stamp) readAgain(path, file);
   sums.channels += file.records.size();
@@ -117,13 +118,19 @@ ChannelFileProblem PublishedChannels::refresh(const std::string& path, File& fil
   return file.problem;
 }
 
+void PublishedChannels::File::letGo() {
+  stamp.reset();
+  text.clear();
+  text.shrink_to_fit();
+  records.clear();
+}
+
 void PublishedChannels::readAgain(const std::string& path, File& file) {
   std::string text;
   FileStamp stamp{};
   file.stamp.reset();
   if (const std::error_code error = readWholeFile(path, kMostFileBytes, text, stamp)) {
-    file.text.clear();
-    file.records.clear();
+    file.letGo();
     file.problem = error == std::errc::no_such_file_or_directory ? ChannelFileProblem() : problemOf(error);
     return;
   }

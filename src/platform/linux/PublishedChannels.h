@@ -50,6 +50,9 @@ class PublishedChannels {
     // Outlives what goes wrong later: these channels are then missing.
     std::optional<std::string> driver;
     std::string logged;  // what was last said of it
+
+    // Frees what was read; it is read anew the next time.
+    void letGo();
   };
   // What files have used up of the bounds.
   struct Sums {

@@ -4,6 +4,7 @@
 #include <filesystem>
 #include <fstream>
 #include <gmock/gmock.h>
+#include <memory>
 #include <string>
 #include <sys/socket.h>
 #include <sys/stat.h>
@@ -282,6 +283,22 @@ TEST_F(PublishedChannelsTest, ReadsBytesUpToTheirBoundAndNotPastIt) {
   std::filesystem::remove(path("0.json"));
   EXPECT_THAT(readAll(), SizeIs(files));
   EXPECT_EQ(code(), 0);
+}
+
+// Or else files that are put before one another, with readings in between, are all held at once.
+TEST_F(PublishedChannelsTest, LetsGoOfAFileThatOthersHavePushedPastTheBound) {
+  publish("z.json", fileOf("Z", channelOf("x")));
+  const std::weak_ptr<const ChanmeterRecord> record = readAll().at(0);
+  EXPECT_FALSE(record.expired());
+  std::string text = fileOf("A", channelOf("x"));
+  text.resize(PublishedChannels::kMostFileBytes, ' ');
+  const std::size_t files = PublishedChannels::kMostBytes / PublishedChannels::kMostFileBytes;
+  for (std::size_t number = 0; number < files; ++number) publish(std::to_string(number) + ".json", text);
+  EXPECT_THAT(readAll(), SizeIs(files));
+  EXPECT_EQ(code(), kChannelsTooMany);
+  EXPECT_TRUE(record.expired());
+  std::filesystem::remove(path("0.json"));
+  EXPECT_EQ(namesOf(readAll()).back(), "Z x=1");
 }
 
 TEST_F(PublishedChannelsTest, GivesChannelsUpToTheirBoundAndNotPastIt) {
