@@ -5,6 +5,7 @@
 #include <tuple>
 
 #include "platform/chanmeter/Counterparts.h"
+#include "platform/chanmeter/DutyCycles.h"
 
 namespace tonewerk {
 namespace {
@@ -25,14 +26,6 @@ std::int64_t counted(std::int64_t later, std::int64_t earlier) {
   return later >= earlier ? saturatingDifference(later, earlier) : later;
 }
 
-void recomputeDutyCycles(std::vector<ChanmeterState>& states) {
-  double sum = 0;  // wide enough for any residencies' sum
-  for (const ChanmeterState& state : states) sum += static_cast<double>(state.residency);
-  for (ChanmeterState& state : states) {
-    state.dutyCycle = sum > 0 ? static_cast<double>(state.residency) / sum : 0.0;
-  }
-}
-
 void subtractStates(std::vector<ChanmeterState>& states, const std::vector<ChanmeterState>& earlier) {
   const auto before = counterparts(
       earlier, states, [](const ChanmeterState& state) -> const std::string& { return state.name; });
@@ -41,7 +34,7 @@ void subtractStates(std::vector<ChanmeterState>& states, const std::vector<Chanm
     states[i].transitions = counted(states[i].transitions, before[i]->transitions);
     states[i].residency = counted(states[i].residency, before[i]->residency);
   }
-  recomputeDutyCycles(states);
+  computeDutyCycles(states);
 }
 
 void subtractBuckets(std::vector<ChanmeterBucket>& buckets, const std::vector<ChanmeterBucket>& earlier) {

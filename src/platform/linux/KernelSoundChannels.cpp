@@ -9,6 +9,7 @@
 #include <utility>
 
 #include "platform/LogLine.h"
+#include "platform/chanmeter/DutyCycles.h"
 #include "platform/linux/ChannelFailures.h"
 #include "platform/linux/PcmStatus.h"
 #include "platform/linux/TextFile.h"
@@ -64,11 +65,7 @@ ChanmeterRecord simpleRecord(ChanmeterKey key, const char* name, std::int64_t va
 
 // Times in milliseconds; the duty cycles follow from them.
 ChanmeterRecord stateRecord(ChanmeterKey key, const char* name, std::vector<ChanmeterState> states) {
-  double sum = 0;
-  for (const ChanmeterState& state : states) sum += static_cast<double>(state.residency);
-  for (ChanmeterState& state : states) {
-    state.dutyCycle = sum > 0 ? static_cast<double>(state.residency) / sum : 0.0;
-  }
+  computeDutyCycles(states);
   key.name = name;
   return {.key = std::move(key), .unit = "ms", .format = kChanmeterFormatState, .states = std::move(states)};
 }
