@@ -51,7 +51,7 @@ DirectoryWatcher::DirectoryWatcher(std::string directory, FileHandler onFile,
       log_(log),
       stop_(eventfd(0, EFD_CLOEXEC)),
       inotify_(inotify_init1(IN_CLOEXEC | IN_NONBLOCK)) {
-  if (!inotify_) {
+  if (!stop_ || !inotify_) {
     noteProblem(errno);
     return;
   }

@@ -42,7 +42,7 @@ class DirectoryWatcher {
   ~DirectoryWatcher();
 
   // False where the system refuses to watch anything; then nothing is ever told.
-  bool isWorking() const { return static_cast<bool>(inotify_); }
+  bool isWorking() const { return stop_ && inotify_; }
 
  private:
   struct Event;
