@@ -1,8 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "monitor/TWReportingSystemMonitor.h"
 
+#include <atomic>
 #include <gmock/gmock.h>
 #include <string>
+#include <thread>
 #include <vector>
 
 #include "session/TWReportingUtility.h"
@@ -189,7 +191,7 @@ TEST_F(SystemMonitorTest, TwoNotificationsWithTheSameValueWakeTwiceSinceTheyWere
   EXPECT_THAT(woken, ElementsAre(second, state("device_name", "Kitchen", 101)));
 }
 
-TEST_F(SystemMonitorTest, HandlersRunOnTheQueueAndObserversInsideTheMapsLock) {
+TEST_F(SystemMonitorTest, HandlersAndObserversRunOnTheQueue) {
   initialize();
   bool onQueue = false;
   const auto observation =
@@ -198,6 +200,27 @@ TEST_F(SystemMonitorTest, HandlersRunOnTheQueueAndObserversInsideTheMapsLock) {
   EXPECT_EQ(map()->find("ringerstate"), std::nullopt);
   run();
   EXPECT_TRUE(onQueue);
+}
+
+TEST_F(SystemMonitorTest, ObserversRunInsideTheMapsLock) {
+  initialize();
+  std::thread other;
+  std::atomic<bool> isComing = false;
+  bool isDone = false;  // no atomic: the lock orders it
+  const auto held = map();
+  const auto observation = ObservableMap::observe(held, "ringerstate", [&](std::string_view) {
+    other = std::thread([&] {
+      isComing = true;
+      isComing.notify_all();
+      EXPECT_NE(held->find("ringerstate"), std::nullopt);
+      EXPECT_TRUE(isDone);
+    });
+    isComing.wait(false);
+    isDone = true;
+  });
+  post(kRinger, 1);
+  ASSERT_TRUE(other.joinable());
+  other.join();
 }
 
 TEST_F(SystemMonitorTest, ARegistrationThatFailsIsLoggedAndItsFeatureKept) {
