@@ -71,14 +71,15 @@ class TwctlTest : public RunningDaemonTest {
 };
 
 TEST_F(TwctlTest, EveryCommandHelps) {
+  const std::vector<std::string> commands{"list",     "validate", "send",      "replay",   "events",
+                                          "metrics",  "power",    "rtc",       "defaults", "notify",
+                                          "captures", "drafts",   "whirlcaps", "channels", "kill"};
   EXPECT_EQ(run({"--help"}), kDone);
-  for (const std::string name :
-       {"list", "validate", "send", "replay", "events", "power", "defaults", "notify", "channels", "kill"}) {
+  for (const std::string& name : commands) {
     SCOPED_TRACE(name);
     EXPECT_THAT(output, HasSubstr("\n  " + name + " "));
   }
-  for (const std::string name :
-       {"list", "validate", "send", "replay", "events", "power", "defaults", "notify", "channels", "kill"}) {
+  for (const std::string& name : commands) {
     SCOPED_TRACE(name);
     EXPECT_EQ(run({name, "--help"}), kDone);
     EXPECT_THAT(output, AllOf(HasSubstr("Usage: twctl " + name), HasSubstr("--json")));
