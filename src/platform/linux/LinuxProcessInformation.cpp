@@ -1,30 +1,16 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/LinuxProcessInformation.h"
 
-#include <charconv>
 #include <ctime>
-#include <string_view>
 #include <unistd.h>
 
+#include "platform/linux/NamedLines.h"
 #include "platform/linux/TextFile.h"
 
 namespace tonewerk {
 namespace {
 
-// The number of kibibytes on the line "Name:    123 kB", in bytes.
-std::optional<std::uint64_t> bytesOnLine(std::string_view status, std::string_view name) {
-  const std::string start = "\n" + std::string(name) + ":";
-  const std::size_t line = status.find(start);
-  if (line == std::string_view::npos) return std::nullopt;
-  status.remove_prefix(line + start.size());
-  const std::size_t digit = status.find_first_not_of(" \t");
-  if (digit == std::string_view::npos) return std::nullopt;
-  status.remove_prefix(digit);
-  std::uint64_t kibibytes = 0;
-  const auto parsed = std::from_chars(status.data(), status.data() + status.size(), kibibytes);
-  if (parsed.ec != std::errc()) return std::nullopt;
-  return kibibytes * 1024;
-}
+constexpr std::uint64_t kKibibyte = 1024;
 
 }  // namespace
 
@@ -43,10 +29,11 @@ std::variant<std::uint64_t, std::string> LinuxProcessInformation::physicalFootpr
   const std::string path = procDirectory_ + "/self/status";
   std::string status;
   if (const std::error_code error = readTextFile(path, status)) return error.message();
-  const auto resident = bytesOnLine(status, "RssAnon");
+  const NamedLines lines(status);
+  const auto resident = lines.number("RssAnon");
   if (!resident) return "no RssAnon in " + path;
   // Kernels built without swapping have no such line.
-  return *resident + bytesOnLine(status, "VmSwap").value_or(0);
+  return (*resident + lines.number("VmSwap").value_or(0)) * kKibibyte;
 }
 
 std::int64_t LinuxProcessInformation::processorTimeMicroseconds() const {

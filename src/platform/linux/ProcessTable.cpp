@@ -2,13 +2,14 @@
 #include "platform/linux/ProcessTable.h"
 
 #include <algorithm>
-#include <array>
 #include <charconv>
 #include <filesystem>
 #include <optional>
 #include <string_view>
 #include <unistd.h>
 
+#include "platform/linux/NamedLines.h"
+#include "platform/linux/ProcessStat.h"
 #include "platform/linux/TextFile.h"
 
 namespace tonewerk {
@@ -25,44 +26,15 @@ T numberOf(std::string_view text) {
   return number;
 }
 
-// The number behind "\nName:" and white space, 0 without such a line.
-std::uint64_t numberOnLine(std::string_view status, std::string_view name) {
-  const std::string start = "\n" + std::string(name) + ":";
-  const std::size_t line = status.find(start);
-  if (line == std::string_view::npos) return 0;
-  status.remove_prefix(line + start.size());
-  status.remove_prefix(std::min(status.find_first_not_of(" \t"), status.size()));
-  return numberOf<std::uint64_t>(status);
-}
-
-// Fields of "123 (name) S 1 ..." behind the name, which may hold anything, closing brackets included.
-constexpr std::size_t kState = 0;
-constexpr std::size_t kParent = 1;
-constexpr std::size_t kUserTicks = 11;
-constexpr std::size_t kSystemTicks = 12;
-constexpr std::size_t kThreads = 17;
-constexpr std::size_t kFields = 18;
-
 bool readStat(std::string_view text, ProcessRow& row) {
-  const std::size_t opening = text.find('(');
-  const std::size_t closing = text.rfind(')');
-  if (opening == std::string_view::npos || closing == std::string_view::npos || closing < opening) {
-    return false;
-  }
-  row.name = text.substr(opening + 1, closing - opening - 1);
-  text.remove_prefix(closing + 1);
-  std::array<std::string_view, kFields> fields;
-  for (std::string_view& field : fields) {
-    text.remove_prefix(std::min(text.find_first_not_of(' '), text.size()));
-    field = text.substr(0, text.find(' '));
-    if (field.empty()) return false;
-    text.remove_prefix(field.size());
-  }
-  row.state = fields[kState].front();
-  row.parent = numberOf<std::int32_t>(fields[kParent]);
-  row.threads = numberOf<std::int64_t>(fields[kThreads]);
-  const auto ticks =
-      numberOf<std::uint64_t>(fields[kUserTicks]) + numberOf<std::uint64_t>(fields[kSystemTicks]);
+  const std::optional<ProcessStat> stat = ProcessStat::parse(text);
+  if (!stat) return false;
+  row.name = stat->name;
+  row.state = stat->fields[ProcessStat::kState].front();
+  row.parent = numberOf<std::int32_t>(stat->fields[ProcessStat::kParent]);
+  row.threads = numberOf<std::int64_t>(stat->fields[ProcessStat::kThreads]);
+  const auto ticks = numberOf<std::uint64_t>(stat->fields[ProcessStat::kUserTicks]) +
+                     numberOf<std::uint64_t>(stat->fields[ProcessStat::kSystemTicks]);
   row.processorSeconds = static_cast<double>(ticks) / static_cast<double>(sysconf(_SC_CLK_TCK));
   return true;
 }
@@ -73,9 +45,11 @@ std::optional<ProcessRow> readProcess(const std::string& directory, std::int32_t
   std::string text;
   if (readTextFile(directory + "/stat", text) || !readStat(text, row)) return std::nullopt;
   if (readTextFile(directory + "/status", text)) return std::nullopt;
-  row.residentBytes = numberOnLine(text, "VmRSS") * kKibibyte;
-  row.privateBytes = (numberOnLine(text, "RssAnon") + numberOnLine(text, "VmSwap")) * kKibibyte;
-  row.lockedBytes = numberOnLine(text, "VmLck") * kKibibyte;
+  const NamedLines status(text);
+  const auto bytesAt = [&](std::string_view name) { return status.number(name).value_or(0) * kKibibyte; };
+  row.residentBytes = bytesAt("VmRSS");
+  row.privateBytes = bytesAt("RssAnon") + bytesAt("VmSwap");
+  row.lockedBytes = bytesAt("VmLck");
   return row;
 }
 

@@ -11,6 +11,9 @@
 #include <string_view>
 #include <system_error>
 
+#include "platform/linux/NamedLines.h"
+#include "platform/linux/ProcessStat.h"
+
 namespace tonewerk {
 namespace {
 
@@ -32,18 +35,6 @@ int readFile(const std::string& path, std::string& text) {
   return text.empty() ? EIO : 0;
 }
 
-// The words of a text.
-std::vector<std::string_view> wordsOf(std::string_view text) {
-  std::vector<std::string_view> words;
-  for (;;) {
-    const std::size_t start = text.find_first_not_of(" \t\n");
-    if (start == std::string_view::npos) return words;
-    text.remove_prefix(start);
-    words.push_back(text.substr(0, text.find_first_of(" \t\n")));
-    text.remove_prefix(words.back().size());
-  }
-}
-
 template <typename Number>
 std::optional<Number> numberOf(std::string_view word) {
   Number number{};
@@ -51,30 +42,6 @@ std::optional<Number> numberOf(std::string_view word) {
   if (error != std::errc() || end != word.data() + word.size()) return std::nullopt;
   return number;
 }
-
-// Lines of the form "Name:   value ...", as status and meminfo are.
-class NamedLines {
- public:
-  explicit NamedLines(std::string text) : text_("\n" + std::move(text)) {}
-
-  std::optional<std::string_view> find(std::string_view name) const {
-    const std::string start = "\n" + std::string(name) + ":";
-    const std::size_t line = text_.find(start);
-    if (line == std::string::npos) return std::nullopt;
-    std::string_view value = std::string_view(text_).substr(line + start.size());
-    value = value.substr(0, value.find('\n'));
-    value.remove_prefix(std::min(value.find_first_not_of(" \t"), value.size()));
-    return value;
-  }
-  // The first number of the line; 0 without one: not every kernel has every line.
-  std::uint64_t number(std::string_view name) const {
-    const auto words = wordsOf(find(name).value_or(std::string_view()));
-    return words.empty() ? 0 : numberOf<std::uint64_t>(words.front()).value_or(0);
-  }
-
- private:
-  const std::string text_;
-};
 
 // Names are anybody's choice.
 std::string printable(std::string_view name) {
@@ -88,13 +55,6 @@ bool isGone(int error) { return error == ENOENT || error == ESRCH; }
 
 double secondsOf(std::string_view ticks, double ticksPerSecond) {
   return static_cast<double>(numberOf<std::uint64_t>(ticks).value_or(0)) / ticksPerSecond;
-}
-
-// Of "PID (name) S ...", where the name may hold anything.
-std::vector<std::string_view> wordsAfterName(std::string_view stat) {
-  const std::size_t nameEnd = stat.rfind(')');
-  return nameEnd == std::string_view::npos ? std::vector<std::string_view>()
-                                           : wordsOf(stat.substr(nameEnd + 1));
 }
 
 }  // namespace
@@ -133,44 +93,45 @@ ProcReader::Outcome ProcReader::readProcess(const std::string& number, ProcessUs
   if (const int error = readFile(directory + "/status", text)) {
     return isGone(error) ? Outcome::kGone : Outcome::kUnreadable;
   }
-  const NamedLines status(std::move(text));
+  const NamedLines status(text);
+  const auto numberAt = [&](std::string_view name) { return status.number(name).value_or(0); };
   // Neither a thread of the kernel nor a process that has ended has any.
   if (!status.find("RssAnon")) return Outcome::kWithoutMemory;
   process.process = numberOf<std::int32_t>(number).value_or(0);
-  process.user = static_cast<std::uint32_t>(status.number("Uid"));
+  process.user = static_cast<std::uint32_t>(numberAt("Uid"));
   process.name = printable(status.find("Name").value_or("?"));
-  process.usage.anonymous = status.number("RssAnon");
-  process.usage.shared = status.number("RssFile") + status.number("RssShmem");
-  process.usage.locked = status.number("VmLck");
-  process.usage.pinned = status.number("VmPin");
-  process.usage.swapped = status.number("VmSwap");
+  process.usage.anonymous = numberAt("RssAnon");
+  process.usage.shared = numberAt("RssFile") + numberAt("RssShmem");
+  process.usage.locked = numberAt("VmLck");
+  process.usage.pinned = numberAt("VmPin");
+  process.usage.swapped = numberAt("VmSwap");
 
-  if (const int error = readFile(directory + "/stat", text)) {
+  std::string statText;
+  if (const int error = readFile(directory + "/stat", statText)) {
     return isGone(error) ? Outcome::kGone : Outcome::kUnreadable;
   }
-  constexpr std::size_t kUserTicks = 11;
-  constexpr std::size_t kSystemTicks = 12;
-  const auto words = wordsAfterName(text);
-  if (words.size() <= kSystemTicks) return Outcome::kUnreadable;
-  process.usage.userSeconds = secondsOf(words[kUserTicks], ticksPerSecond_);
-  process.usage.systemSeconds = secondsOf(words[kSystemTicks], ticksPerSecond_);
+  const std::optional<ProcessStat> stat = ProcessStat::parse(statText);
+  if (!stat) return Outcome::kUnreadable;
+  process.usage.userSeconds = secondsOf(stat->fields[ProcessStat::kUserTicks], ticksPerSecond_);
+  process.usage.systemSeconds = secondsOf(stat->fields[ProcessStat::kSystemTicks], ticksPerSecond_);
   return Outcome::kRead;
 }
 
 bool ProcReader::readSystem(MemoryUsage& system) const {
   std::string text;
   if (readFile(root_ + "/meminfo", text) != 0) return false;
-  const NamedLines memory(std::move(text));
-  if (memory.number("MemTotal") == 0) return false;
+  const NamedLines memory(text);
+  const auto numberAt = [&](std::string_view name) { return memory.number(name).value_or(0); };
+  if (numberAt("MemTotal") == 0) return false;
   const auto difference = [&](std::string_view whole, std::uint64_t part) {
-    const std::uint64_t total = memory.number(whole);
+    const std::uint64_t total = numberAt(whole);
     return total - std::min(total, part);
   };
-  system.anonymous = memory.number("AnonPages");
-  system.shared = difference("MemTotal", memory.number("MemFree") + system.anonymous);
-  system.locked = memory.number("Mlocked");
-  system.pinned = memory.number("SUnreclaim") + memory.number("KernelStack") + memory.number("PageTables");
-  system.swapped = difference("SwapTotal", memory.number("SwapFree"));
+  system.anonymous = numberAt("AnonPages");
+  system.shared = difference("MemTotal", numberAt("MemFree") + system.anonymous);
+  system.locked = numberAt("Mlocked");
+  system.pinned = numberAt("SUnreclaim") + numberAt("KernelStack") + numberAt("PageTables");
+  system.swapped = difference("SwapTotal", numberAt("SwapFree"));
   readProcessorTime(system);
   return true;
 }

@@ -1,0 +1,50 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstddef>
+#include <optional>
+#include <string_view>
+#include <vector>
+
+namespace tonewerk {
+
+// The words of a text, between white space.
+inline std::vector<std::string_view> wordsOf(std::string_view text) {
+  constexpr std::string_view kWhiteSpace = " \t\n";
+  std::vector<std::string_view> words;
+  for (;;) {
+    const std::size_t start = text.find_first_not_of(kWhiteSpace);
+    if (start == std::string_view::npos) return words;
+    text.remove_prefix(start);
+    words.push_back(text.substr(0, text.find_first_of(kWhiteSpace)));
+    text.remove_prefix(words.back().size());
+  }
+}
+
+// The text of /proc/PID/stat, "PID (name) S 1 ...".
+struct ProcessStat {
+  // Places in `fields`.
+  static constexpr std::size_t kState = 0;
+  static constexpr std::size_t kParent = 1;
+  static constexpr std::size_t kUserTicks = 11;
+  static constexpr std::size_t kSystemTicks = 12;
+  static constexpr std::size_t kThreads = 17;
+  static constexpr std::size_t kFields = 18;  // up to the last of them
+
+  std::string_view name;                 // may hold anything, closing brackets included
+  std::vector<std::string_view> fields;  // those behind the name; at least kFields
+
+  // What it gives refers to `text`. None for what is no such text, or ends before kFields.
+  static std::optional<ProcessStat> parse(std::string_view text) {
+    const std::size_t opening = text.find('(');
+    const std::size_t closing = text.rfind(')');
+    if (opening == std::string_view::npos || closing == std::string_view::npos || closing < opening) {
+      return std::nullopt;
+    }
+    ProcessStat stat{text.substr(opening + 1, closing - opening - 1), wordsOf(text.substr(closing + 1))};
+    if (stat.fields.size() < kFields) return std::nullopt;
+    return stat;
+  }
+};
+
+}  // namespace tonewerk
