@@ -81,10 +81,6 @@ std::vector<ChanmeterState> statesOf(const PcmStatus& status) {
   return states;
 }
 
-void addIfChosen(const ChannelChoice& choice, ChanmeterRecord record, ChanmeterRecords& records) {
-  if (choice.has(record.key)) records.push_back(std::make_shared<ChanmeterRecord>(std::move(record)));
-}
-
 bool isAnyChosen(const ChannelChoice& choice, ChanmeterKey key, std::initializer_list<const char*> names) {
   return std::any_of(names.begin(), names.end(), [&](const char* name) {
     key.name = name;
@@ -134,11 +130,9 @@ void KernelSoundChannels::readPower(Reading& reading, const std::string& driver,
   if (!active || !suspended) {
     return complain(reading, kChannelsNotUnderstood, directory, "has no times in milliseconds");
   }
-  addIfChosen(
-      reading.choice,
-      stateRecord(key, "Power",
-                  {{.name = "active", .residency = *active}, {.name = "suspended", .residency = *suspended}}),
-      reading.records);
+  addIfChosen(reading, stateRecord(key, "Power",
+                                   {{.name = "active", .residency = *active},
+                                    {.name = "suspended", .residency = *suspended}}));
 }
 
 void KernelSoundChannels::readSubstreams(Reading& reading, const std::string& driver, const std::string& card,
@@ -168,10 +162,23 @@ void KernelSoundChannels::readSubstream(Reading& reading, ChanmeterKey key, cons
   if (readTextFile(directory + "/hw_params", parameters)) parameters.clear();
   const std::optional<PcmStatus> status = PcmStatus::parse(text, parameters);
   if (!status) return complain(reading, kChannelsNotUnderstood, directory + "/status", "is not understood");
-  addIfChosen(reading.choice, simpleRecord(key, "Hardware Position", status->hardwarePosition),
-              reading.records);
-  addIfChosen(reading.choice, simpleRecord(key, "Delay", status->delay), reading.records);
-  addIfChosen(reading.choice, stateRecord(std::move(key), "State", statesOf(*status)), reading.records);
+  addIfChosen(reading, simpleRecord(key, "Hardware Position", status->hardwarePosition));
+  addIfChosen(reading, simpleRecord(key, "Delay", status->delay));
+  addIfChosen(reading, stateRecord(std::move(key), "State", statesOf(*status)));
+}
+
+void KernelSoundChannels::addIfChosen(Reading& reading, ChanmeterRecord record) {
+  if (reading.choice.has(record.key)) reading.records.push_back(shared(std::move(record)));
+}
+
+std::shared_ptr<const ChanmeterRecord> KernelSoundChannels::shared(ChanmeterRecord record) {
+  const std::lock_guard lock(mutex_);
+  if (latest_.size() >= kMostKept) latest_.clear();  // cards came and went
+  auto& latest = latest_[record.key];
+  if (latest == nullptr || *latest != record) {
+    latest = std::make_shared<const ChanmeterRecord>(std::move(record));
+  }
+  return latest;
 }
 
 void KernelSoundChannels::complain(Reading& reading, std::int64_t code, const std::string& path,

@@ -2,6 +2,8 @@
 #pragma once
 
 #include <cstddef>
+#include <map>
+#include <memory>
 #include <mutex>
 #include <optional>
 #include <set>
@@ -24,10 +26,14 @@ namespace tonewerk {
 // The kernel counts no transitions, so these are 0. A substream that nobody has open is at position 0 with no
 // delay. A card without power management has no Power.
 //
+// A channel that did not change since it was last read gives the same record again, so that the snapshots of
+// many sessions share it.
+//
 // Any thread.
 class KernelSoundChannels {
  public:
   static constexpr std::size_t kMostSubstreams = 256;  // of all cards together; the others are left out
+  static constexpr std::size_t kMostKept = 4 * kMostSubstreams;  // records; past them all are forgotten
 
   // Below `root` are /proc/asound and /sys/class/sound; empty for the real ones. `log` outlives this.
   KernelSoundChannels(const std::string& root, const LogCategory& log)
@@ -52,6 +58,8 @@ class KernelSoundChannels {
   void readPower(Reading& reading, const std::string& driver, const std::string& directory);
   void readSubstreams(Reading& reading, const std::string& driver, const std::string& card, char direction);
   void readSubstream(Reading& reading, ChanmeterKey key, const std::string& directory);
+  void addIfChosen(Reading& reading, ChanmeterRecord record);
+  std::shared_ptr<const ChanmeterRecord> shared(ChanmeterRecord record);
   void complain(Reading& reading, std::int64_t code, const std::string& path, std::string_view what);
 
   const std::string cards_;
@@ -59,6 +67,7 @@ class KernelSoundChannels {
   const LogCategory& log_;
   std::mutex mutex_;                  // guards what follows
   std::set<std::string> complaints_;  // the paths that were logged, at most kMostSubstreams
+  std::map<ChanmeterKey, std::shared_ptr<const ChanmeterRecord>> latest_;  // at most kMostKept
 };
 
 }  // namespace tonewerk

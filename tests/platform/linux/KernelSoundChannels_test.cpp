@@ -20,11 +20,14 @@ using testing::SizeIs;
 
 class KernelSoundChannelsTest : public testing::Test {
  protected:
-  std::vector<ChanmeterRecord> read(const ChannelChoice& choice) {
+  ChanmeterRecords readShared(const ChannelChoice& choice) {
     ChanmeterRecords records;
     error_.reset();
     channels_.read(choice, records, error_);
-    return channels::plain(records);
+    return records;
+  }
+  std::vector<ChanmeterRecord> read(const ChannelChoice& choice) {
+    return channels::plain(readShared(choice));
   }
   std::vector<ChanmeterRecord> readGroup(const std::string& name) {
     const std::optional<std::string> group = name;
@@ -120,6 +123,24 @@ TEST_F(KernelSoundChannelsTest, FollowsTheSubstreams) {
   std::filesystem::remove_all(tree_.path("sys/class/sound/card0"));
   EXPECT_THAT(namesOf(readGroup("Tx")), SizeIs(3));
   EXPECT_FALSE(error_);
+}
+
+// Each running session holds a snapshot: thousands of them cost little while nothing plays.
+TEST_F(KernelSoundChannelsTest, SharesTheRecordsOfWhatDidNotChange) {
+  const std::optional<std::string> group = "Tx";
+  const std::optional<std::string> subGroup;
+  const ChannelChoice playback(group, subGroup);
+  const ChanmeterRecords before = readShared(playback);
+  ASSERT_THAT(before, SizeIs(9));
+  EXPECT_EQ(readShared(playback), before);
+  tree_.setStatus("state: RUNNING\ndelay : 3540\nhw_ptr : 1384652\n");
+  const ChanmeterRecords after = readShared(playback);
+  ASSERT_THAT(after, SizeIs(9));
+  EXPECT_NE(after[0], before[0]);
+  EXPECT_EQ(after[0]->value, 1384652);
+  EXPECT_EQ(before[0]->value, 1336652);
+  EXPECT_EQ(after[1], before[1]) << "the delay is the same";
+  EXPECT_EQ(after[3], before[3]) << "nobody has the other one open";
 }
 
 TEST_F(KernelSoundChannelsTest, HasNothingOnAMachineWithoutSoundCards) {
