@@ -24,12 +24,14 @@
 #include "platform/linux/LinuxPlatform.h"
 #include "platform/linux/ReportStore.h"
 #include "platform/linux/ServerSocket.h"
+#include "platform/linux/ServiceManager.h"
 #include "platform/linux/StoreDiagwire.h"
 #include "platform/linux/StoreEnergybook.h"
 #include "platform/linux/StoreMetricon.h"
 #include "platform/linux/Tracing.h"
 #include "platform/linux/TracingSetup.h"
 #include "platform/linux/UnixSocketListener.h"
+#include "platform/linux/WatchdogFeeder.h"
 #include "service/TWReportingService.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingUtility.h"
@@ -60,12 +62,21 @@ constexpr std::string_view kHelp =
     "things\n"
     "are, TONEWERK_LOG what is logged (debug, info, default, error, or a list such as twrr=debug,default).\n";
 
+// The thread that serves clients feeds the service manager's watchdog, where there is one: what blocks the
+// work queue, which some handlers do for minutes by design, is no reason to end the daemon.
+std::unique_ptr<WatchdogFeeder> watchdogOf(const ServiceManager& manager, const Clock& clock) {
+  const auto interval = manager.pingInterval();
+  if (!interval) return nullptr;
+  return std::make_unique<WatchdogFeeder>(*interval, clock, [&manager] { manager.ping(); });
+}
+
 // The daemon's parts, in the order in which they need one another.
 class Daemon {
  public:
   Daemon(const Directories& directories, std::unique_ptr<ServerSocket> socket, LinuxPlatform& linux,
-         const LogCategory& log)
-      : store_(directories.state, linux.json(), linux.preferences(), linux.clock(), log),
+         const ServiceManager& manager, const LogCategory& log)
+      : manager_(manager),
+        store_(directories.state, linux.json(), linux.preferences(), linux.clock(), log),
         metricon_(store_, linux.preferences(), linux.clock(), log),
         energybook_(store_, linux.clock()),
         diagwire_(store_, linux.clock()),
@@ -77,7 +88,7 @@ class Daemon {
         diagnostics_(linux.diagnostics()),
         context_(platformOf(linux, directories), allWorkerClasses()),
         service_(TWReportingService::make([this] { endOnKillRequest(); })),
-        listener_(std::move(socket), log) {
+        listener_(std::move(socket), log, watchdogOf(manager, linux.clock())) {
     diagnostics_.removeLeftovers();  // the socket is ours, so no other daemon writes there
     const bool traces = isTracingBuiltIn() && context_.isInternalBuild();
     if (const std::error_code error = setSignpostMark(directories.runtime, traces)) {
@@ -89,6 +100,7 @@ class Daemon {
 
   // Every client is treated as lost, so that its started sessions stop and report.
   void endInOrder() {
+    manager_.tellStopping("Finishing sessions and reports");
     listener_.shutDown();
     SerialQueue& queue = context_.reportingServerQueue();
     queue.async([this] {
@@ -108,6 +120,7 @@ class Daemon {
 
   // No session stops; what the sinks already have is written.
   [[noreturn]] void endOnKillRequest() {
+    manager_.tellStopping("Killed by a client; finishing reports");
     flushSinks();
     ::_exit(kKilled);
   }
@@ -121,6 +134,7 @@ class Daemon {
     diagnostics_.finish(kDiagnosticsTimeout);
   }
 
+  const ServiceManager& manager_;
   ReportStore store_;
   StoreMetricon metricon_;
   StoreEnergybook energybook_;
@@ -177,8 +191,11 @@ int run() {
     errorLog(log, "cannot listen: %@", problem);
     return kFailure;
   }
+  const std::string status = "Listening on " + socket->name();
   defaultLog(log, "listening on %@, state in %@", socket->name(), directories.state);
-  Daemon daemon(directories, std::move(socket), linux, log);
+  const ServiceManager manager{};
+  Daemon daemon(directories, std::move(socket), linux, manager, log);
+  manager.tellReady(status);
   waitForEndSignal(signals);
   daemon.endInOrder();
   return kSuccess;

@@ -29,11 +29,13 @@ std::size_t descriptorsForClients() {
 
 }  // namespace
 
-UnixSocketListener::UnixSocketListener(std::unique_ptr<ServerSocket> socket, const LogCategory& log)
+UnixSocketListener::UnixSocketListener(std::unique_ptr<ServerSocket> socket, const LogCategory& log,
+                                       std::unique_ptr<WatchdogFeeder> watchdog)
     : socket_(std::move(socket)),
       log_(log),
       readBuffer_(kReadBytes),
       context_{epoll_, waker_, texts_, readBuffer_, log_},
+      watchdog_(std::move(watchdog)),
       mostConnections_(descriptorsForClients()) {}
 
 UnixSocketListener::~UnixSocketListener() { shutDown(); }
@@ -60,8 +62,9 @@ void UnixSocketListener::run() {
   infoLog(log_, "listening at %@", socket_->name());
   while (!isStopping_) {
     const WorkBatch round;
-    for (const Epoll::Event& event : epoll_.wait(timeToNextAccept())) handle(event);
+    for (const Epoll::Event& event : epoll_.wait(timeToNextRound())) handle(event);
     if (acceptAgainAt_ && std::chrono::steady_clock::now() >= *acceptAgainAt_) resumeAccepting();
+    if (watchdog_ != nullptr) watchdog_->pingIfDue();
   }
   endEverything();
 }
@@ -132,6 +135,12 @@ std::optional<std::chrono::milliseconds> UnixSocketListener::timeToNextAccept() 
   const auto left =
       std::chrono::ceil<std::chrono::milliseconds>(*acceptAgainAt_ - std::chrono::steady_clock::now());
   return std::max(left, std::chrono::milliseconds::zero());
+}
+
+std::optional<std::chrono::milliseconds> UnixSocketListener::timeToNextRound() const {
+  const auto accept = timeToNextAccept();
+  if (watchdog_ == nullptr) return accept;
+  return accept ? std::min(*accept, watchdog_->timeToNext()) : watchdog_->timeToNext();
 }
 
 void UnixSocketListener::removeIfEnded(std::uint64_t identifier) {

@@ -18,6 +18,7 @@
 #include "platform/linux/RpcFrameReader.h"
 #include "platform/linux/ServerSocket.h"
 #include "platform/linux/UnixConnection.h"
+#include "platform/linux/WatchdogFeeder.h"
 
 namespace tonewerk {
 
@@ -34,8 +35,10 @@ class UnixSocketListener final : public MessagingListener {
   // end.
   static constexpr std::chrono::milliseconds kAcceptPause{1000};
 
-  // `log` outlives the listener.
-  UnixSocketListener(std::unique_ptr<ServerSocket> socket, const LogCategory& log);
+  // `log` outlives the listener. The messaging thread feeds `watchdog`; without one it wakes up for clients
+  // alone.
+  UnixSocketListener(std::unique_ptr<ServerSocket> socket, const LogCategory& log,
+                     std::unique_ptr<WatchdogFeeder> watchdog = nullptr);
   ~UnixSocketListener() override;
 
   void setDelegate(MessagingListenerDelegate& delegate) override { delegate_ = &delegate; }
@@ -55,6 +58,7 @@ class UnixSocketListener final : public MessagingListener {
   void pauseAccepting(const std::string& why);
   void resumeAccepting();
   std::optional<std::chrono::milliseconds> timeToNextAccept() const;
+  std::optional<std::chrono::milliseconds> timeToNextRound() const;
   void removeIfEnded(std::uint64_t identifier);
   void endEverything();
 
@@ -68,6 +72,7 @@ class UnixSocketListener final : public MessagingListener {
   RpcTexts texts_;
   std::vector<char> readBuffer_;
   const UnixConnectionContext context_;
+  const std::unique_ptr<WatchdogFeeder> watchdog_;  // none where nobody watches
   const std::size_t mostConnections_;
   std::unordered_map<std::uint64_t, std::unique_ptr<UnixConnection>> connections_;
   std::uint64_t nextIdentifier_ = kWaker + 1;

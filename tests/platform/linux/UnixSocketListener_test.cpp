@@ -2,7 +2,9 @@
 #include "platform/linux/UnixSocketListener.h"
 
 #include <atomic>
+#include <chrono>
 #include <cstdint>
+#include <future>
 #include <gmock/gmock.h>
 #include <memory>
 #include <optional>
@@ -17,6 +19,7 @@
 #include "platform/linux/RawClient.h"
 #include "platform/linux/RpcLimits.h"
 #include "platform/linux/RpcWriter.h"
+#include "platform/linux/SystemClock.h"
 #include "support/MemoryLog.h"
 #include "support/TemporaryDirectory.h"
 
@@ -27,6 +30,7 @@ using testing::ElementsAre;
 using testing::HasSubstr;
 using testing::IsEmpty;
 using testing::SizeIs;
+using namespace std::chrono_literals;
 
 std::string requestOf(std::uint32_t identifier, std::string_view method, const Arguments& arguments) {
   std::string frame;
@@ -538,6 +542,28 @@ TEST_F(FewDescriptorsTest, PausesWhenTheSystemHasNoDescriptorAndSaysSoOnce) {
   listener.shutDown();
   EXPECT_THAT(log.textsOf("twrs", LogLevel::kError),
               ElementsAre(HasSubstr("cannot accept another client for now")));
+}
+
+TEST(UnixSocketListenerWatchdogTest, IsFedByTheMessagingThreadWithoutAnyClient) {
+  const TemporaryDirectory directory;
+  MemoryLog log;
+  const LogCategory category{log, "com.example", "twrs"};
+  const SystemClock clock;
+  std::string problem;
+  auto socket = ServerSocket::open(directory.path("reporting.sock"), problem);
+  ASSERT_NE(socket, nullptr) << problem;
+  constexpr int kEnough = 3;
+  std::atomic<int> pings = 0;
+  std::promise<void> enough;
+  auto feeder = std::make_unique<WatchdogFeeder>(1ms, clock, [&] {
+    if (++pings == kEnough) enough.set_value();
+  });
+  UnixSocketListener listener(std::move(socket), category, std::move(feeder));
+  MessagingRecord record;
+  RigDelegate delegate(record);
+  listener.setDelegate(delegate);
+  listener.resume();
+  EXPECT_EQ(enough.get_future().wait_for(kPatience), std::future_status::ready);
 }
 
 }  // namespace

@@ -24,14 +24,11 @@ namespace {
 constexpr std::chrono::milliseconds kPollInterval{10};
 
 // Variables that would lead a child to what is not the test's own.
-constexpr std::array<std::string_view, 14> kForeignVariables = {
-    "RUNTIME_DIRECTORY", "STATE_DIRECTORY",
-    "LOGS_DIRECTORY",    "CONFIGURATION_DIRECTORY",
-    "LISTEN_FDS",        "LISTEN_PID",
-    "LISTEN_FDNAMES",    "JOURNAL_STREAM",
-    "NOTIFY_SOCKET",     "TONEWERK_LOG",
-    "XDG_STATE_HOME",    "XDG_CONFIG_HOME",
-    "PIPEWIRE_REMOTE",   "TONEWERK_REPORTING_SOCKET",
+constexpr std::array<std::string_view, 16> kForeignVariables = {
+    "RUNTIME_DIRECTORY", "STATE_DIRECTORY", "LOGS_DIRECTORY",  "CONFIGURATION_DIRECTORY",
+    "LISTEN_FDS",        "LISTEN_PID",      "LISTEN_FDNAMES",  "JOURNAL_STREAM",
+    "NOTIFY_SOCKET",     "TONEWERK_LOG",    "WATCHDOG_USEC",   "WATCHDOG_PID",
+    "XDG_STATE_HOME",    "XDG_CONFIG_HOME", "PIPEWIRE_REMOTE", "TONEWERK_REPORTING_SOCKET",
 };
 
 std::vector<std::string> environmentFor(const std::map<std::string, std::string>& changes) {

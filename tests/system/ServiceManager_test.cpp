@@ -1,0 +1,78 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// The daemon and the service manager that started it.
+#include <fcntl.h>
+#include <string>
+#include <sys/stat.h>
+
+#include "platform/linux/FileDescriptor.h"
+#include "support/NotifySocket.h"
+#include "system/support/DaemonTest.h"
+
+namespace tonewerk {
+namespace {
+
+using ::testing::HasSubstr;
+using ::testing::IsEmpty;
+using ::testing::Not;
+
+constexpr AudioServiceType kTest = 11;
+constexpr AudioEventType kMemoryLog = 19;
+
+class ServiceManagerSystemTest : public DaemonTest {
+ protected:
+  void SetUp() override { daemon.setEnvironment("NOTIFY_SOCKET", manager.path()); }
+
+  NotifySocket manager;
+};
+
+TEST_F(ServiceManagerSystemTest, IsToldWhenTheDaemonServesAndWhenItStops) {
+  ASSERT_TRUE(daemon.start());
+  EXPECT_THAT(manager.waitForLine("READY=1"), HasSubstr("STATUS=Listening on " + daemon.socketPath()));
+  EXPECT_TRUE(daemon.accepts());
+  EXPECT_EQ(daemon.stop(), 0);
+  EXPECT_THAT(manager.waitForLine("STOPPING=1"), HasSubstr("STATUS="));
+}
+
+TEST_F(ServiceManagerSystemTest, IsToldOfTheEndByTheKillRequest) {
+  ASSERT_TRUE(daemon.start());
+  DaemonClient client = connect();
+  client.notify("killService", {});
+  EXPECT_EQ(daemon.process().wait(), 2);
+  EXPECT_THAT(manager.waitForLine("STOPPING=1"), Not(IsEmpty()));
+}
+
+TEST_F(ServiceManagerSystemTest, GetsNoPingsThatItDidNotAskFor) {
+  ASSERT_TRUE(daemon.start());
+  EXPECT_EQ(daemon.stop(), 0);
+  for (const std::string& message : manager.take()) EXPECT_THAT(message, Not(HasSubstr("WATCHDOG")));
+}
+
+TEST_F(ServiceManagerSystemTest, IsPingedWhileTheWorkQueueIsBlocked) {
+  const TemporaryDirectory directory;
+  const std::string gate = directory.path("gate");
+  ASSERT_EQ(mkfifo(gate.c_str(), 0600), 0);
+  ASSERT_TRUE(daemon.writeConfiguration("preferences/com.orvane.tonewerk.twreporting.toml",
+                                        R"(memory_tools = ["cat )" + gate + R"(", "true"])"));
+  daemon.setEnvironment("WATCHDOG_USEC", "200000");
+  ASSERT_TRUE(daemon.start());
+  EXPECT_THAT(manager.waitForLine("READY=1"), Not(IsEmpty()));
+
+  DaemonClient client = connect();
+  client.create(77, kTest);
+  client.start(77);
+  client.request("sendMessage", ReportingClient::messageArguments({{"reason", "test"}}, 1, kMemoryLog, {77}));
+  ASSERT_TRUE(waitForLogLine("wiredlog: requesting"));
+  {
+    // The queue waits for the tool, which waits for somebody to write to it.
+    const FileDescriptor tool(::open(gate.c_str(), O_WRONLY | O_CLOEXEC));
+    ASSERT_TRUE(tool);
+    manager.take();
+    for (int pings = 0; pings < 5; ++pings) EXPECT_EQ(manager.waitForLine("WATCHDOG=1"), "WATCHDOG=1");
+    EXPECT_EQ(logLinesWith("request cat", "captured"), 0U);
+  }
+  EXPECT_TRUE(waitForLogLine("request cat " + gate + " captured"));
+}
+
+}  // namespace
+}  // namespace tonewerk
