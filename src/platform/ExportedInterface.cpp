@@ -6,6 +6,7 @@
 namespace tonewerk {
 namespace {
 
+constexpr std::uint32_t kRoot = 0;
 constexpr std::uint64_t kInt64Most = static_cast<std::uint64_t>(std::numeric_limits<std::int64_t>::max());
 
 // An integer of either form that lies in [least, most].
@@ -89,6 +90,12 @@ std::optional<std::string> problemWith(const Method& method, const Arguments& ar
 
 ReplyError messagingError(std::int64_t code, std::string message) {
   return ReplyError{std::string(kMessagingErrorDomain), code, std::move(message)};
+}
+
+std::optional<ReplyError> problemWithCaller(const Method& method, std::uint32_t user, std::uint32_t owner) {
+  if (!method.forOwner || user == kRoot || (user == owner && user != kNoUser)) return std::nullopt;
+  return messagingError(kNotPermitted,
+                        std::string(method.name) + " is only for the user that the daemon runs as, and root");
 }
 
 }  // namespace tonewerk

@@ -26,6 +26,9 @@ struct Method {
   // What an answer may come to. It counts against the connection's bound from the request on, since an answer
   // is only measured when it is too late to refuse it.
   std::size_t replyBytes = 0;
+  // Only for the user the daemon runs as, and root: what shows more of other clients than their identifiers.
+  // Front ends that do not know their peers' users leave such methods out.
+  bool forOwner = false;
 };
 
 // The request set of an exported object. A request names its method by the place in `methods`.
@@ -57,8 +60,15 @@ inline constexpr std::string_view kMessagingErrorDomain = "com.orvane.tonewerk.m
 inline constexpr std::int64_t kUnknownMethod = 1;
 inline constexpr std::int64_t kInvalidArguments = 2;
 inline constexpr std::int64_t kOverLimit = 3;
+inline constexpr std::int64_t kNotPermitted = 4;
 
 ReplyError messagingError(std::int64_t code, std::string message);
+
+// A user that nobody is: that of a peer of whom the kernel says nothing.
+inline constexpr std::uint32_t kNoUser = 0xFFFF'FFFF;
+
+// Why a peer of that user may not call `method` in a daemon that runs as `owner`, or none.
+std::optional<ReplyError> problemWithCaller(const Method& method, std::uint32_t user, std::uint32_t owner);
 
 // Takes answers. Any thread.
 class ReplySink {

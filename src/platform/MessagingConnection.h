@@ -24,6 +24,7 @@ class MessagingConnection {
 
   // The peer's, as the kernel says it.
   virtual std::int32_t processIdentifier() const = 0;
+  virtual std::uint32_t userIdentifier() const = 0;  // kNoUser when it says none
 
   // For log lines.
   virtual std::string description() const = 0;

@@ -128,5 +128,26 @@ TEST(RequestTokenTest, FinishesItsRequestOnceWhereverItIsCarried) {
   EXPECT_EQ(gauge->bytes, 15U);
 }
 
+TEST(ExportedInterfaceTest, WhatIsForTheOwnerIsForTheDaemonsUserAndRoot) {
+  constexpr std::uint32_t kOwner = 500;
+  const Method method{"watch", {}, 0, true};
+  EXPECT_EQ(problemWithCaller(method, kOwner, kOwner), std::nullopt);
+  EXPECT_EQ(problemWithCaller(method, 0, kOwner), std::nullopt);
+  const ReplyError refusal{std::string(kMessagingErrorDomain), kNotPermitted,
+                           "watch is only for the user that the daemon runs as, and root"};
+  EXPECT_EQ(problemWithCaller(method, 501, kOwner), refusal);
+  EXPECT_EQ(problemWithCaller(method, 501, 0), refusal);
+}
+
+TEST(ExportedInterfaceTest, APeerOfWhomTheKernelSaysNothingIsNobodysOwner) {
+  EXPECT_NE(problemWithCaller(Method{"watch", {}, 0, true}, kNoUser, 500), std::nullopt);
+  EXPECT_NE(problemWithCaller(Method{"watch", {}, 0, true}, kNoUser, kNoUser), std::nullopt);
+}
+
+TEST(ExportedInterfaceTest, EverythingElseIsForEverybody) {
+  EXPECT_EQ(problemWithCaller(Method{"test", {}}, 501, 500), std::nullopt);
+  EXPECT_EQ(problemWithCaller(Method{"test", {}}, kNoUser, 500), std::nullopt);
+}
+
 }  // namespace
 }  // namespace tonewerk

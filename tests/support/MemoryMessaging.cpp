@@ -14,9 +14,11 @@ class MemoryClient::Connection final : public MessagingConnection,
                                        public RequestGauge,
                                        public std::enable_shared_from_this<Connection> {
  public:
-  explicit Connection(std::int32_t processIdentifier) : processIdentifier_(processIdentifier) {}
+  Connection(std::int32_t processIdentifier, std::uint32_t userIdentifier)
+      : processIdentifier_(processIdentifier), userIdentifier_(userIdentifier) {}
 
   std::int32_t processIdentifier() const override { return processIdentifier_; }
+  std::uint32_t userIdentifier() const override { return userIdentifier_; }
   std::string description() const override {
     return "memory connection of " + std::to_string(processIdentifier_);
   }
@@ -96,7 +98,11 @@ class MemoryClient::Connection final : public MessagingConnection,
     const Reply reply = request.identifier ? Reply(shared_from_this(), *request.identifier) : Reply();
     const std::optional<std::size_t> place = interface_->find(request.method);
     if (!place) return reply(messagingError(kUnknownMethod, "unknown method " + request.method));
-    if (const auto problem = problemWith(interface_->methods[*place], request.arguments)) {
+    const Method& method = interface_->methods[*place];
+    if (const auto problem = problemWithCaller(method, userIdentifier_, MemoryMessaging::kOwner)) {
+      return reply(problem);
+    }
+    if (const auto problem = problemWith(method, request.arguments)) {
       return reply(messagingError(kInvalidArguments, *problem));
     }
     {
@@ -109,6 +115,7 @@ class MemoryClient::Connection final : public MessagingConnection,
   }
 
   const std::int32_t processIdentifier_;
+  const std::uint32_t userIdentifier_;
   const ExportedInterface* interface_ = nullptr;
   std::shared_ptr<ExportedObject> object_;
   std::function<void()> interrupted_;
@@ -169,9 +176,10 @@ void MemoryMessaging::shutDown() {
   }
 }
 
-std::unique_ptr<MemoryClient> MemoryMessaging::connect(std::int32_t processIdentifier) {
+std::unique_ptr<MemoryClient> MemoryMessaging::connect(std::int32_t processIdentifier,
+                                                       std::uint32_t userIdentifier) {
   if (!isAccepting_ || delegate_ == nullptr) return nullptr;
-  auto connection = std::make_shared<MemoryClient::Connection>(processIdentifier);
+  auto connection = std::make_shared<MemoryClient::Connection>(processIdentifier, userIdentifier);
   if (!delegate_->listenerShouldAcceptNewConnection(*connection)) return nullptr;
   std::erase_if(connections_, [](const auto& held) { return held.expired(); });
   connections_.push_back(connection);

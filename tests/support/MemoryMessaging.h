@@ -72,8 +72,12 @@ class MemoryMessaging final : public MessagingListener {
   void resume() override { isAccepting_ = true; }
   void shutDown() override;
 
-  // A client process connects. Null when nobody listens or the delegate turns it away.
-  std::unique_ptr<MemoryClient> connect(std::int32_t processIdentifier = 1000);
+  // The user that the daemon runs as.
+  static constexpr std::uint32_t kOwner = 500;
+
+  // A client process of that user connects. Null when nobody listens or the delegate turns it away.
+  std::unique_ptr<MemoryClient> connect(std::int32_t processIdentifier = 1000,
+                                        std::uint32_t userIdentifier = kOwner);
 
  private:
   MessagingListenerDelegate* delegate_ = nullptr;

@@ -139,6 +139,7 @@ std::optional<ReplyError> UnixConnection::problemWithFrame(const RpcFrame& frame
   if (!method)
     return messagingError(kUnknownMethod, "unknown method " + std::string(shortened(frame.method)));
   const Method& known = interface_->methods[*method];
+  if (auto problem = problemWithCaller(known, userIdentifier_, context_.owner)) return problem;
   if (frame.refused) return messagingError(kInvalidArguments, problemText(known, *frame.refused));
   std::optional<std::string> problem = problemWith(known, frame.arguments);
   return problem ? std::optional(messagingError(kInvalidArguments, std::move(*problem))) : std::nullopt;

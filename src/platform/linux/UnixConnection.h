@@ -28,6 +28,7 @@ struct UnixConnectionContext {
   RpcTexts& texts;
   std::span<char> readBuffer;
   const LogCategory& log;
+  std::uint32_t owner;  // who may use what is for the daemon's own user
 };
 
 // One client's socket, on the I/O thread.
@@ -44,6 +45,7 @@ class UnixConnection final : public MessagingConnection {
   ~UnixConnection() override;
 
   std::int32_t processIdentifier() const override { return processIdentifier_; }
+  std::uint32_t userIdentifier() const override { return userIdentifier_; }
   std::string description() const override;
   void exportObject(const ExportedInterface& interface, std::shared_ptr<ExportedObject> object) override;
   void setInterruptionHandler(std::function<void()> handler) override { interrupted_ = std::move(handler); }
@@ -72,7 +74,7 @@ class UnixConnection final : public MessagingConnection {
   const std::uint64_t identifier_;
   FileDescriptor socket_;
   std::int32_t processIdentifier_ = 0;
-  std::uint32_t userIdentifier_ = 0;
+  std::uint32_t userIdentifier_ = kNoUser;
 
   const ExportedInterface* interface_ = nullptr;
   std::shared_ptr<ExportedObject> object_;

@@ -30,11 +30,11 @@ std::size_t descriptorsForClients() {
 }  // namespace
 
 UnixSocketListener::UnixSocketListener(std::unique_ptr<ServerSocket> socket, const LogCategory& log,
-                                       std::unique_ptr<WatchdogFeeder> watchdog)
+                                       std::unique_ptr<WatchdogFeeder> watchdog, std::uint32_t owner)
     : socket_(std::move(socket)),
       log_(log),
       readBuffer_(kReadBytes),
-      context_{epoll_, waker_, texts_, readBuffer_, log_},
+      context_{epoll_, waker_, texts_, readBuffer_, log_, owner},
       watchdog_(std::move(watchdog)),
       mostConnections_(descriptorsForClients()) {}
 

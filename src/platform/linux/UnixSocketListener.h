@@ -9,6 +9,7 @@
 #include <mutex>
 #include <optional>
 #include <thread>
+#include <unistd.h>
 #include <unordered_map>
 #include <vector>
 
@@ -36,9 +37,9 @@ class UnixSocketListener final : public MessagingListener {
   static constexpr std::chrono::milliseconds kAcceptPause{1000};
 
   // `log` outlives the listener. The messaging thread feeds `watchdog`; without one it wakes up for clients
-  // alone.
+  // alone. `owner` is the user who, beside root, may use what is for the daemon's own.
   UnixSocketListener(std::unique_ptr<ServerSocket> socket, const LogCategory& log,
-                     std::unique_ptr<WatchdogFeeder> watchdog = nullptr);
+                     std::unique_ptr<WatchdogFeeder> watchdog = nullptr, std::uint32_t owner = ::geteuid());
   ~UnixSocketListener() override;
 
   void setDelegate(MessagingListenerDelegate& delegate) override { delegate_ = &delegate; }

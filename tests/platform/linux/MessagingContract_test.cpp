@@ -27,6 +27,7 @@ class MemorySide {
     messaging_.resume();
   }
   static std::int32_t clientProcess() { return 77; }
+  static std::uint32_t clientUser() { return MemoryMessaging::kOwner; }
   void connect() { client_ = messaging_.connect(clientProcess()); }
   void request(std::string_view method, Arguments arguments) {
     client_->request(method, std::move(arguments));
@@ -60,6 +61,7 @@ class SocketSide {
     listener_->resume();
   }
   static std::int32_t clientProcess() { return ::getpid(); }
+  static std::uint32_t clientUser() { return ::geteuid(); }
   void connect() { EXPECT_FALSE(client_.connect({path_})); }
   void request(std::string_view method, const Arguments& arguments) {
     EXPECT_FALSE(
@@ -105,6 +107,16 @@ TYPED_TEST(MessagingContractTest, TellsTheDelegateWhoConnects) {
   this->side.connect();
   ASSERT_TRUE(this->record.waitForEvents(1));
   EXPECT_EQ(this->delegate.lastProcessIdentifier, TypeParam::clientProcess());
+  EXPECT_EQ(this->delegate.lastUserIdentifier, TypeParam::clientUser());
+}
+
+TYPED_TEST(MessagingContractTest, LetsItsOwnUserCallWhatIsForTheOwner) {
+  this->side.connect();
+  this->side.request("takeFromOwner", {Value(1)});
+  const std::vector<Answer> answers = this->side.answers(1);
+  ASSERT_THAT(answers, SizeIs(1));
+  EXPECT_FALSE(answers[0].error);
+  EXPECT_THAT(this->record.requests(), SizeIs(1));
 }
 
 TYPED_TEST(MessagingContractTest, DoesNotServeWhomTheDelegateTurnsAway) {

@@ -42,6 +42,7 @@ inline const ExportedInterface& rigInterface() {
           {"holdReply", {{"number", ParameterType::kInt64}}},  // keeps the reply alone
           {"holdMap", {{"map", ParameterType::kMap}}},         // keeps token and reply
           {"holdLarge", {}, std::size_t{1} << 20},             // likewise; its answer may come to a MiB
+          {"takeFromOwner", {{"number", ParameterType::kInt64}}, 0, true},  // for the daemon's user alone
     }
   };
   return interface;
@@ -144,6 +145,7 @@ class RigDelegate final : public MessagingListenerDelegate {
       return false;
     }
     lastProcessIdentifier = connection.processIdentifier();
+    lastUserIdentifier = connection.userIdentifier();
     connection.exportObject(rigInterface(), std::make_shared<RigObject>(record_));
     connection.setInterruptionHandler([this] { record_.add("interrupted"); });
     connection.setInvalidationHandler([this] { record_.add("invalidated"); });
@@ -154,6 +156,7 @@ class RigDelegate final : public MessagingListenerDelegate {
 
   std::atomic<bool> turnsAway = false;
   std::atomic<std::int32_t> lastProcessIdentifier = 0;
+  std::atomic<std::uint32_t> lastUserIdentifier = kNoUser;
 
  private:
   MessagingRecord& record_;

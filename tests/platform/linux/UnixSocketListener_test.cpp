@@ -10,6 +10,8 @@
 #include <optional>
 #include <string>
 #include <sys/resource.h>
+#include <sys/stat.h>
+#include <sys/syscall.h>
 #include <thread>
 #include <unistd.h>
 #include <vector>
@@ -198,6 +200,77 @@ TEST_F(UnixSocketListenerTest, PrefersTheUnknownMethodToItsArguments) {
   const std::optional<RpcFrame> response = client.response();
   ASSERT_TRUE(response && response->error && response->error->asMap());
   EXPECT_EQ(response->error->asMap()->integer("code"), kUnknownMethod);
+}
+
+// A client of a user who is neither the daemon's nor root. Root can become somebody else for a connection, on
+// one thread; anybody else is made a stranger to the daemon instead, and needs no connection of another user.
+class StrangerTest : public UnixSocketListenerTest {
+ protected:
+  static constexpr std::uint32_t kStranger = 65'534;
+
+  void SetUp() override {
+    if (::geteuid() != 0) {
+      listener = nullptr;  // lets go of the path
+      std::string problem;
+      listener =
+          std::make_unique<UnixSocketListener>(ServerSocket::open(path, problem), category, ::geteuid() + 1);
+      listener->setDelegate(delegate);
+    }
+    listener->resume();
+  }
+
+  std::unique_ptr<RawClient> connectAsStranger() {
+    if (::geteuid() != 0) return std::make_unique<RawClient>(path);
+    EXPECT_EQ(::chmod(directory.path().c_str(), 0711), 0);
+    EXPECT_EQ(::chmod(path.c_str(), 0666), 0);
+    std::unique_ptr<RawClient> client;
+    std::thread stranger([&] {
+      // The system call itself changes this thread alone; the library's function would change them all.
+      EXPECT_EQ(::syscall(SYS_setresuid, -1, kStranger, -1), 0);
+      client = std::make_unique<RawClient>(path);
+    });
+    stranger.join();
+    return client;
+  }
+};
+
+TEST_F(StrangerTest, IsRefusedWhatIsForTheOwnerAndServedAllElse) {
+  const auto client = connectAsStranger();
+  ASSERT_TRUE(client->isConnected());
+  ASSERT_TRUE(client->send(requestOf(1, "takeFromOwner", {Value(1)})));
+  const std::optional<RpcFrame> response = client->response();
+  ASSERT_TRUE(response && response->error && response->error->asMap());
+  const ValueMap expected{
+      {"domain", kMessagingErrorDomain},
+      {"code", 4},
+      {"message", "takeFromOwner is only for the user that the daemon runs as, and root"}};
+  EXPECT_EQ(*response->error->asMap(), expected) << response->error->text();
+  EXPECT_THAT(record.requests(), IsEmpty());
+  expectServed(*client);
+}
+
+TEST_F(StrangerTest, LearnsThatItIsNotPermittedBeforeWhatIsWrongWithItsArguments) {
+  const auto client = connectAsStranger();
+  ASSERT_TRUE(client->isConnected());
+  ASSERT_TRUE(client->send(requestOf(1, "takeFromOwner", {Value("text")})));
+  const std::optional<RpcFrame> response = client->response();
+  ASSERT_TRUE(response && response->error && response->error->asMap());
+  EXPECT_EQ(response->error->asMap()->integer("code"), kNotPermitted);
+}
+
+TEST_F(UnixSocketListenerTest, ServesRootWhatIsForTheOwnerWhoeverThatIs) {
+  if (::geteuid() != 0) GTEST_SKIP() << "only root can be root";
+  listener = nullptr;
+  std::string problem;
+  listener =
+      std::make_unique<UnixSocketListener>(ServerSocket::open(path, problem), category, nullptr, 12'345);
+  listener->setDelegate(delegate);
+  listener->resume();
+  RawClient client(path);
+  ASSERT_TRUE(client.send(requestOf(1, "takeFromOwner", {Value(1)})));
+  const std::optional<RpcFrame> response = client.response();
+  ASSERT_TRUE(response);
+  EXPECT_FALSE(response->error);
 }
 
 TEST_F(UnixSocketListenerTest, EndsAConnectionThatSendsNonsenseAndServesTheOthers) {
