@@ -212,8 +212,8 @@ class StrangerTest : public UnixSocketListenerTest {
     if (::geteuid() != 0) {
       listener = nullptr;  // lets go of the path
       std::string problem;
-      listener =
-          std::make_unique<UnixSocketListener>(ServerSocket::open(path, problem), category, ::geteuid() + 1);
+      listener = std::make_unique<UnixSocketListener>(ServerSocket::open(path, problem), category, nullptr,
+                                                      ::geteuid() + 1);
       listener->setDelegate(delegate);
     }
     listener->resume();
