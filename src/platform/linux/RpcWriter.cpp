@@ -2,13 +2,10 @@
 #include "platform/linux/RpcWriter.h"
 
 #include <algorithm>
-#include <array>
-#include <bit>
 #include <cstddef>
-#include <msgpack.hpp>
 
 #include "platform/linux/RpcLimits.h"
-#include "platform/linux/RpcTimestamp.h"
+#include "platform/linux/RpcPacker.h"
 
 namespace tonewerk {
 namespace {
@@ -19,15 +16,9 @@ struct Output {
   void write(const char* data, std::size_t size) { text.append(data, size); }
 };
 
-class ValuePacker : public msgpack::packer<Output> {
+class ValuePacker : public RpcPacker<Output> {
  public:
-  explicit ValuePacker(Output& output) : packer(output), output_(output) {}
-
-  void text(std::string_view text) {
-    const auto size = static_cast<std::uint32_t>(text.size());
-    pack_str(size);
-    pack_str_body(text.data(), size);
-  }
+  using RpcPacker::RpcPacker;
 
   void value(const Value& value) {
     switch (value.kind()) {
@@ -83,23 +74,6 @@ class ValuePacker : public msgpack::packer<Output> {
   }
 
  private:
-  // By hand: the library's own would make an integer of a double without a fraction, and the reader of 2.0
-  // would get something else than was sent.
-  void number(double number) {
-    const auto bits = std::bit_cast<std::uint64_t>(number);
-    std::array<char, 1 + sizeof(bits)> bytes{'\xCB'};
-    for (std::size_t at = 0; at < sizeof(bits); ++at) {
-      bytes[at + 1] = static_cast<char>(bits >> (8 * (sizeof(bits) - 1 - at)) & 0xFFU);
-    }
-    output_.write(bytes.data(), bytes.size());
-  }
-
-  void date(Date date) {
-    const std::string body = timestampOf(date);
-    pack_ext(body.size(), static_cast<std::int8_t>(kTimestampExtension));
-    pack_ext_body(body.data(), static_cast<std::uint32_t>(body.size()));
-  }
-
   void array(const ValueArray& array) {
     pack_array(static_cast<std::uint32_t>(array.size()));
     for (const Value& element : array) value(element);
@@ -112,8 +86,6 @@ class ValuePacker : public msgpack::packer<Output> {
       value(entry.value);
     }
   }
-
-  Output& output_;
 };
 
 bool fits(const Value& value, std::size_t depthLeft) {
