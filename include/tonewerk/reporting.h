@@ -96,7 +96,7 @@ typedef struct twr_payload {
   uint32_t open[TWR_MOST_PAYLOAD_DEPTH]; /* where the containers begin that are still open */
 } twr_payload;
 
-/* An empty map. An entry takes its name, its text, and at most 15 bytes more; a container 10 bytes. */
+/* An empty map. An entry takes its name, its text, and at most 20 bytes more; a container its name and 10. */
 TWR_API void twr_payload_init(twr_payload* payload, void* memory, size_t size);
 /* An empty list, for twr_client_request(); its values are put with NULL for a name. */
 TWR_API void twr_payload_init_list(twr_payload* payload, void* memory, size_t size);

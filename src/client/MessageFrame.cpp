@@ -1,0 +1,103 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "client/MessageFrame.h"
+
+#include <string_view>
+
+#include "platform/linux/RpcPacker.h"
+
+namespace tonewerk {
+namespace {
+
+constexpr std::string_view kTimestamp = "twreporting_timestamp";
+constexpr std::string_view kDropped = "twreporting_dropped";
+
+struct Output {
+  std::string& text;
+  void write(const char* data, std::size_t size) { text.append(data, size); }
+};
+
+// Reads one object and remembers whether it is the time stamp's name.
+class NameVisitor : public msgpack::null_visitor {
+ public:
+  bool isTimestamp() const { return isTimestamp_; }
+
+  // What the library calls, by its names.
+  bool visit_str(const char* text, std::uint32_t size) {
+    isTimestamp_ = depth_ == 0 && std::string_view(text, size) == kTimestamp;
+    return true;
+  }
+  bool start_array(std::uint32_t) { return enter(); }
+  bool end_array() { return leave(); }
+  bool start_map(std::uint32_t) { return enter(); }
+  bool end_map() { return leave(); }
+
+ private:
+  bool enter() {
+    ++depth_;
+    return true;
+  }
+  bool leave() {
+    --depth_;
+    return true;
+  }
+
+  bool isTimestamp_ = false;
+  int depth_ = 0;
+};
+
+// A program may have scribbled over its payload: what is no MessagePack is left for the daemon to refuse.
+bool hasTimestampEntry(std::string_view bytes) {
+  try {
+    bool isName = true;
+    for (std::size_t at = 0; at < bytes.size(); isName = !isName) {
+      NameVisitor visitor;
+      if (!msgpack::parse(bytes.data(), bytes.size(), at, visitor)) return false;
+      if (isName && visitor.isTimestamp()) return true;
+    }
+  } catch (const msgpack::unpack_error&) {
+    return false;
+  }
+  return false;
+}
+
+bool isStamped(std::string_view bytes) {
+  // Nearly no payload has the text anywhere, and looking for that costs next to nothing.
+  return bytes.find(kTimestamp) != std::string_view::npos && hasTimestampEntry(bytes);
+}
+
+}  // namespace
+
+void appendMessageFrame(std::string& out, std::optional<std::uint32_t> requestIdentifier,
+                        const RingMessage& message, std::span<const std::int64_t> reporterIDs) {
+  const std::string_view bytes(reinterpret_cast<const char*>(message.bytes.data()), message.bytes.size());
+  const bool stamps = !isStamped(bytes);
+  const bool tellsLoss = message.dropped > 0;
+
+  Output output{out};
+  RpcPacker packer(output);
+  packer.pack_array(requestIdentifier ? 4 : 3);
+  packer.pack_uint8(requestIdentifier ? 0 : 2);
+  if (requestIdentifier) packer.pack_uint32(*requestIdentifier);
+  packer.text("sendMessage");
+  packer.pack_array(4);
+  packer.pack_map(message.entries + (stamps ? 1U : 0U) + (tellsLoss ? 1U : 0U));
+  out.append(bytes);
+  if (stamps) {
+    packer.text(kTimestamp);
+    packer.number(message.time);
+  }
+  if (tellsLoss) {
+    packer.text(kDropped);
+    packer.pack_uint64(message.dropped);
+  }
+  packer.pack_uint32(message.category);
+  packer.pack_uint16(message.type);
+  if (reporterIDs.empty()) {
+    packer.pack_nil();
+    return;
+  }
+  packer.pack_array(static_cast<std::uint32_t>(reporterIDs.size()));
+  for (const std::int64_t identifier : reporterIDs) packer.pack_int64(identifier);
+}
+
+}  // namespace tonewerk

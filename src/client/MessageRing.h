@@ -1,0 +1,98 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <atomic>
+#include <cstddef>
+#include <cstdint>
+#include <optional>
+#include <span>
+#include <vector>
+
+#include "tonewerk/reporting.h"
+
+namespace tonewerk {
+
+// A message on its way to the daemon.
+struct RingMessage {
+  std::uint32_t category;
+  std::uint16_t type;
+  double time;                           // seconds since 1970
+  std::uint64_t dropped;                 // since the message before
+  std::uint32_t entries;                 // of its map, which `bytes` hold one after the other
+  std::span<const unsigned char> bytes;  // MessagePack, without the map's header
+};
+
+// The wall clock to a few milliseconds, which no system call answers whatever the clock source is.
+double coarseSeconds();
+
+// What a real-time thread says, until a background thread takes it.
+//
+//   producer: push() ...            consumer: front(), pop(), front(), pop() ...
+//
+// One thread at a time on each side. Wait-free on both: neither ever waits for the other, and the producer
+// makes no system call, takes no lock and allocates nothing. A message that finds no room is dropped and
+// counted; the next one that is taken carries the count.
+class MessageRing {
+ public:
+  // A message's own, next to its bytes, which are rounded up to a multiple of kAlignmentBytes.
+  static constexpr std::size_t kHeaderBytes = 32;
+  static constexpr std::size_t kAlignmentBytes = 8;
+  static constexpr std::size_t kLeastBytes = 64;
+
+  // Rounds up to a power of two of at least kLeastBytes and at most TWR_MOST_RING_BYTES, and touches the
+  // memory, so that no page of it is missing later.
+  explicit MessageRing(std::size_t bytes);
+  MessageRing(const MessageRing&) = delete;
+  MessageRing& operator=(const MessageRing&) = delete;
+
+  std::size_t capacity() const { return memory_.size(); }
+
+  // Producer. TWR_OK; TWR_FULL for now; TWR_TOO_LARGE for ever; TWR_INVALID for a list; the payload's
+  // problem. Whatever is not taken counts as dropped.
+  twr_status push(std::uint32_t category, std::uint16_t type, const twr_payload& payload);
+
+  // Consumer. The oldest message, and the same again until pop(); its bytes are valid until then.
+  std::optional<RingMessage> front();
+  // Consumer, after front() gave one.
+  void pop();
+
+  // Any thread. Positions grow for ever: everything written before is read once readPosition() has come to
+  // what writtenPosition() was.
+  std::uint64_t writtenPosition() const { return written_.load(std::memory_order_acquire); }
+  std::uint64_t readPosition() const { return read_.load(std::memory_order_acquire); }
+  std::uint64_t dropped() const { return dropped_.load(std::memory_order_acquire); }
+
+  // Consumer, after the producer is done and the last message popped: what was dropped since, as a message
+  // without entries, of the last dropped one's category and of TWR_TYPE_UNKNOWN. Once.
+  std::optional<RingMessage> unreportedLoss();
+
+ private:
+  struct Header;
+
+  twr_status drop(std::uint32_t category, twr_status why);
+  bool hasRoom(std::uint64_t written, std::size_t bytes);
+  void copyIn(std::uint64_t position, const void* from, std::size_t size);
+  void copyOut(std::uint64_t position, void* to, std::size_t size) const;
+  std::span<const unsigned char> bytesAt(std::uint64_t position, std::size_t size);
+
+  // What one side writes lies apart from what the other does, so that neither pulls the other's cache line
+  // away; each looks at the other's position only when its own copy of it says that there is nothing to do.
+  static constexpr std::size_t kCacheLineBytes = 64;
+
+  std::vector<unsigned char> memory_;
+
+  alignas(kCacheLineBytes) std::atomic<std::uint64_t> written_{0};
+  std::atomic<std::uint64_t> dropped_{0};
+  std::atomic<std::uint32_t> lastDroppedCategory_{0};
+  std::uint64_t droppedBefore_ = 0;  // the last message taken
+  std::uint64_t seenRead_ = 0;
+
+  alignas(kCacheLineBytes) std::atomic<std::uint64_t> read_{0};
+  std::uint64_t seenWritten_ = 0;
+  std::uint64_t reportedDropped_ = 0;
+  std::size_t frontBytes_ = 0;
+  std::uint64_t frontDropped_ = 0;
+  std::vector<unsigned char> joined_;  // the bytes of a front that goes over the ring's end
+};
+
+}  // namespace tonewerk

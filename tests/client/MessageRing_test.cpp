@@ -1,0 +1,296 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "client/MessageRing.h"
+
+#include <cstring>
+#include <deque>
+#include <gmock/gmock.h>
+#include <rapidcheck/gtest.h>
+#include <string>
+#include <thread>
+#include <tuple>
+#include <vector>
+
+#include "platform/linux/RpcLimits.h"
+
+namespace tonewerk {
+namespace {
+
+using testing::Optional;
+
+// A payload of one text entry, `size` bytes long in all, told apart by its fill.
+class Text {
+ public:
+  Text(std::size_t size, char fill) : bytes_(size, fill) {
+    twr_payload_init(&payload_, bytes_.data(), bytes_.size());
+    payload_.size = payload_.capacity;
+    payload_.entries = 1;
+  }
+  operator const twr_payload&() const { return payload_; }
+
+ private:
+  std::string bytes_;
+  twr_payload payload_{};
+};
+
+std::string textOf(const RingMessage& message) { return {message.bytes.begin(), message.bytes.end()}; }
+
+std::size_t takenBy(std::size_t bytes) {
+  return MessageRing::kHeaderBytes + (bytes + MessageRing::kAlignmentBytes - 1) /
+                                         MessageRing::kAlignmentBytes * MessageRing::kAlignmentBytes;
+}
+
+TEST(MessageRingTest, HasNothingAtFirst) {
+  MessageRing ring(4096);
+  EXPECT_FALSE(ring.front());
+  EXPECT_FALSE(ring.unreportedLoss());
+  EXPECT_EQ(ring.writtenPosition(), ring.readPosition());
+  EXPECT_EQ(ring.dropped(), 0U);
+}
+
+TEST(MessageRingTest, RoundsItsSizeUpToAPowerOfTwo) {
+  EXPECT_EQ(MessageRing(0).capacity(), MessageRing::kLeastBytes);
+  EXPECT_EQ(MessageRing(4096).capacity(), 4096U);
+  EXPECT_EQ(MessageRing(4097).capacity(), 8192U);
+  EXPECT_EQ(MessageRing(SIZE_MAX).capacity(), std::size_t{TWR_MOST_RING_BYTES});
+}
+
+TEST(MessageRingTest, GivesWhatWasPushedWithTheTimeOfThePush) {
+  MessageRing ring(4096);
+  const double before = coarseSeconds();
+  ASSERT_EQ(ring.push(TWR_CATEGORY_VOLUME, TWR_TYPE_STATE, Text(10, 'a')), TWR_OK);
+  const double after = coarseSeconds();
+  const std::optional<RingMessage> message = ring.front();
+  ASSERT_TRUE(message);
+  EXPECT_EQ(message->category, TWR_CATEGORY_VOLUME);
+  EXPECT_EQ(message->type, TWR_TYPE_STATE);
+  EXPECT_EQ(message->entries, 1U);
+  EXPECT_EQ(message->dropped, 0U);
+  EXPECT_EQ(textOf(*message), std::string(10, 'a'));
+  EXPECT_GE(message->time, before);
+  EXPECT_LE(message->time, after);
+}
+
+TEST(MessageRingTest, TakesAPayloadWithoutEntriesAndWithoutMemory) {
+  MessageRing ring(4096);
+  twr_payload empty;
+  twr_payload_init(&empty, nullptr, 0);
+  ASSERT_EQ(ring.push(1, 0, empty), TWR_OK);
+  ASSERT_TRUE(ring.front());
+  EXPECT_EQ(ring.front()->entries, 0U);
+  EXPECT_TRUE(ring.front()->bytes.empty());
+}
+
+TEST(MessageRingTest, KeepsTheFrontUntilItIsPopped) {
+  MessageRing ring(4096);
+  std::ignore = ring.push(1, 0, Text(5, 'a'));
+  std::ignore = ring.push(2, 0, Text(5, 'b'));
+  EXPECT_EQ(ring.front()->category, 1U);
+  EXPECT_EQ(ring.front()->category, 1U);
+  ring.pop();
+  EXPECT_EQ(ring.front()->category, 2U);
+  ring.pop();
+  EXPECT_FALSE(ring.front());
+}
+
+TEST(MessageRingTest, HasReadWhatWasWrittenOnceItIsPopped) {
+  MessageRing ring(4096);
+  std::ignore = ring.push(1, 0, Text(5, 'a'));
+  const std::uint64_t written = ring.writtenPosition();
+  EXPECT_LT(ring.readPosition(), written);
+  ASSERT_TRUE(ring.front());
+  EXPECT_LT(ring.readPosition(), written);
+  ring.pop();
+  EXPECT_EQ(ring.readPosition(), written);
+}
+
+TEST(MessageRingTest, TakesAMessageThatFillsItToTheLastByte) {
+  MessageRing ring(256);
+  const std::size_t most = 256 - MessageRing::kHeaderBytes;
+  ASSERT_EQ(ring.push(1, 0, Text(most, 'a')), TWR_OK);
+  EXPECT_EQ(ring.push(1, 0, Text(0, 'b')), TWR_FULL);
+  EXPECT_EQ(textOf(*ring.front()), std::string(most, 'a'));
+  ring.pop();
+  EXPECT_EQ(ring.push(1, 0, Text(0, 'b')), TWR_OK);
+}
+
+TEST(MessageRingTest, TakesTheLargestMessageAtAnyPlaceOfTheRing) {
+  MessageRing ring(256);
+  const std::size_t most = 256 - MessageRing::kHeaderBytes;
+  for (std::size_t shift = 0; shift < 256; shift += MessageRing::kAlignmentBytes) {
+    ASSERT_EQ(ring.push(7, 3, Text(most, static_cast<char>(shift))), TWR_OK);
+    ASSERT_EQ(textOf(*ring.front()), std::string(most, static_cast<char>(shift)));
+    ring.pop();
+    ASSERT_EQ(ring.push(1, 0, Text(1, 'x')), TWR_OK);  // 40 bytes: every place comes up
+    ASSERT_EQ(textOf(*ring.front()), "x");
+    ring.pop();
+  }
+}
+
+TEST(MessageRingTest, RefusesForEverWhatCanNeverFit) {
+  MessageRing ring(256);
+  EXPECT_EQ(ring.push(1, 0, Text(256 - MessageRing::kHeaderBytes + 1, 'a')), TWR_TOO_LARGE);
+  EXPECT_EQ(ring.dropped(), 1U);
+}
+
+TEST(MessageRingTest, RefusesWhatNoFrameCanHold) {
+  MessageRing ring(TWR_MOST_RING_BYTES);
+  EXPECT_EQ(ring.push(1, 0, Text(kMostFrameBytes, 'a')), TWR_TOO_LARGE);
+  EXPECT_EQ(ring.push(1, 0, Text(kMostFrameBytes - 1024, 'a')), TWR_OK);
+}
+
+TEST(MessageRingTest, RefusesAPayloadWithAProblemByThatAndCountsIt) {
+  MessageRing ring(4096);
+  std::vector<unsigned char> memory(4);
+  twr_payload payload;
+  twr_payload_init(&payload, memory.data(), memory.size());
+  ASSERT_EQ(twr_put_text(&payload, "name", "value"), TWR_TOO_LARGE);
+  EXPECT_EQ(ring.push(1, 0, payload), TWR_TOO_LARGE);
+
+  twr_payload_init_list(&payload, memory.data(), memory.size());
+  EXPECT_EQ(ring.push(1, 0, payload), TWR_INVALID);
+  EXPECT_FALSE(ring.front());
+  EXPECT_EQ(ring.dropped(), 2U);
+}
+
+TEST(MessageRingTest, CarriesTheNumberOfDroppedMessagesWithTheNextOneTaken) {
+  MessageRing ring(64);
+  ASSERT_EQ(ring.push(1, 0, Text(0, 'a')), TWR_OK);
+  ASSERT_EQ(ring.push(2, 0, Text(0, 'b')), TWR_OK);
+  EXPECT_EQ(ring.push(3, 0, Text(0, 'c')), TWR_FULL);
+  EXPECT_EQ(ring.push(4, 0, Text(0, 'd')), TWR_FULL);
+  EXPECT_EQ(ring.front()->dropped, 0U);
+  ring.pop();
+  ASSERT_EQ(ring.push(5, 0, Text(0, 'e')), TWR_OK);
+  EXPECT_EQ(ring.front()->dropped, 0U);  // taken before the loss
+  ring.pop();
+  EXPECT_EQ(ring.front()->category, 5U);
+  EXPECT_EQ(ring.front()->dropped, 2U);
+  ring.pop();
+  ASSERT_EQ(ring.push(6, 0, Text(0, 'f')), TWR_OK);
+  EXPECT_EQ(ring.front()->dropped, 0U);  // said once
+  EXPECT_EQ(ring.dropped(), 2U);
+}
+
+TEST(MessageRingTest, TellsALossOnceThatNoMessageCarries) {
+  MessageRing ring(64);
+  std::ignore = ring.push(1, 0, Text(32, 'a'));
+  EXPECT_EQ(ring.push(2, 0, Text(0, 'b')), TWR_FULL);
+  EXPECT_EQ(ring.push(TWR_CATEGORY_IO, 5, Text(0, 'c')), TWR_FULL);
+  ASSERT_TRUE(ring.front());
+  ring.pop();
+  const std::optional<RingMessage> loss = ring.unreportedLoss();
+  ASSERT_TRUE(loss);
+  EXPECT_EQ(loss->category, TWR_CATEGORY_IO);
+  EXPECT_EQ(loss->type, TWR_TYPE_UNKNOWN);
+  EXPECT_EQ(loss->dropped, 2U);
+  EXPECT_EQ(loss->entries, 0U);
+  EXPECT_TRUE(loss->bytes.empty());
+  EXPECT_NEAR(loss->time, coarseSeconds(), 60);
+  EXPECT_FALSE(ring.unreportedLoss());
+}
+
+TEST(MessageRingTest, HasNoUnreportedLossWhenAMessageCarriesIt) {
+  MessageRing ring(64);
+  std::ignore = ring.push(1, 0, Text(32, 'a'));
+  EXPECT_EQ(ring.push(2, 0, Text(0, 'b')), TWR_FULL);
+  ASSERT_TRUE(ring.front());
+  ring.pop();
+  ASSERT_EQ(ring.push(3, 0, Text(0, 'c')), TWR_OK);
+  EXPECT_EQ(ring.front()->dropped, 1U);
+  ring.pop();
+  EXPECT_FALSE(ring.unreportedLoss());
+}
+
+// What a ring of messages is, said with a queue of them.
+struct Model {
+  struct Message {
+    std::uint32_t category;
+    std::string text;
+    std::uint64_t dropped;
+  };
+
+  explicit Model(std::size_t bytes) : capacity(bytes) {}
+
+  twr_status push(std::uint32_t category, const std::string& text) {
+    const std::size_t needed = takenBy(text.size());
+    if (needed > capacity || used + needed > capacity) {
+      ++dropped;
+      return needed > capacity ? TWR_TOO_LARGE : TWR_FULL;
+    }
+    used += needed;
+    messages.push_back({category, text, dropped});
+    dropped = 0;
+    return TWR_OK;
+  }
+
+  void pop() {
+    used -= takenBy(messages.front().text.size());
+    messages.pop_front();
+  }
+
+  std::size_t capacity;
+  std::size_t used = 0;
+  std::uint64_t dropped = 0;
+  std::deque<Message> messages;
+};
+
+RC_GTEST_PROP(MessageRingTest, DoesWhatAQueueWithALimitDoes, ()) {
+  const std::size_t capacity = std::size_t{64} << *rc::gen::inRange<unsigned>(0, 5);
+  MessageRing ring(capacity);
+  Model model(capacity);
+  // Positive: a push of a text so long; else a pop.
+  const auto steps = *rc::gen::container<std::vector<int>>(rc::gen::weightedOneOf<int>(
+      {{3, rc::gen::inRange(0, 100)}, {1, rc::gen::inRange(0, 1100)}, {3, rc::gen::just(-1)}}));
+  std::uint32_t number = 0;
+  for (const int step : steps) {
+    if (step >= 0) {
+      const Text text(static_cast<std::size_t>(step), static_cast<char>('a' + number % 26));
+      const std::string same(static_cast<std::size_t>(step), static_cast<char>('a' + number % 26));
+      RC_ASSERT(ring.push(number, 1, text) == model.push(number, same));
+      ++number;
+      continue;
+    }
+    const std::optional<RingMessage> front = ring.front();
+    RC_ASSERT(front.has_value() == !model.messages.empty());
+    if (!front) continue;
+    RC_ASSERT(front->category == model.messages.front().category);
+    RC_ASSERT(front->dropped == model.messages.front().dropped);
+    RC_ASSERT(textOf(*front) == model.messages.front().text);
+    ring.pop();
+    model.pop();
+  }
+  RC_ASSERT(ring.writtenPosition() - ring.readPosition() == model.used);
+}
+
+TEST(MessageRingTest, LosesAndMixesNothingBetweenTwoThreads) {
+  constexpr std::uint32_t kMessages = 20'000;
+  MessageRing ring(512);  // small, so that it runs full and wraps all the time
+  std::atomic<bool> isDone{false};
+  std::thread producer([&] {
+    for (std::uint32_t number = 0; number < kMessages; ++number) {
+      std::ignore = ring.push(number, 1, Text(number % 97, static_cast<char>(number)));
+    }
+    isDone = true;
+  });
+
+  std::uint64_t next = 0;
+  const auto take = [&] {
+    const std::optional<RingMessage> message = ring.front();
+    if (!message) return false;
+    // What was dropped since the message before is exactly what is missing between the two.
+    EXPECT_EQ(message->category, next + message->dropped);
+    EXPECT_EQ(textOf(*message), std::string(message->category % 97, static_cast<char>(message->category)));
+    next = std::uint64_t{message->category} + 1;
+    ring.pop();
+    return true;
+  };
+  while (!isDone) take();
+  producer.join();
+  while (take()) {
+  }
+  if (const std::optional<RingMessage> loss = ring.unreportedLoss()) next += loss->dropped;
+  EXPECT_EQ(next, kMessages);
+}
+
+}  // namespace
+}  // namespace tonewerk

@@ -1,0 +1,24 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstddef>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <utility>
+
+#include "platform/linux/RpcFrameReader.h"
+
+namespace tonewerk {
+
+// The one frame that `bytes` are; none when they are anything else.
+inline std::optional<RpcFrame> frameOf(std::string_view bytes) {
+  const std::size_t size = bytes.size();
+  RpcTexts texts;
+  RpcFrameReader reader(texts);
+  if (reader.next(bytes) != RpcFrameReader::Result::kFrame) return std::nullopt;
+  if (reader.frame().wireBytes != size) return std::nullopt;
+  return std::move(reader.frame());
+}
+
+}  // namespace tonewerk
