@@ -84,6 +84,17 @@ class ManualPagesTest(unittest.TestCase):
             with self.subTest(section=text.splitlines()[0]):
                 self.assertEqual(explained_options(text), options)
 
+    def test_explain_every_function_of_the_library(self):
+        header = (SOURCE / "include/tonewerk/reporting.h").read_text()
+        declared = set(re.findall(r"^TWR_API [^;(]*?(twr_\w+)\(", header, re.MULTILINE))
+        self.assertGreater(len(declared), 30)
+        page = MANUAL / "libtwreporting.3"
+        functions = r"^\.F[no] (twr_\w+)"
+        self.assertEqual(set(re.findall(functions, section(page, "SYNOPSIS"), re.MULTILINE)), declared)
+        statuses = re.search(r"typedef enum twr_status {(.*?)}", header, re.DOTALL).group(1)
+        explained = re.findall(r"^\.It Dv (\w+)", section(page, "RETURN VALUES"), re.MULTILINE)
+        self.assertEqual(explained, re.findall(r"(TWR_\w+) =", statuses))
+
     def test_refer_to_pages_that_exist(self):
         names = {page.name for page in PAGES}
         for page in PAGES:
