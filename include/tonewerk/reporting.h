@@ -37,6 +37,8 @@
  * Unloading the library ends its threads; what is then still queued is lost.
  */
 
+/* NOLINTBEGIN(readability-identifier-naming,modernize-*): these are C's names. */
+
 #include <stddef.h>
 #include <stdint.h>
 
@@ -369,5 +371,7 @@ TWR_API void twr_sender_close(twr_sender* sender);
 #ifdef __cplusplus
 }
 #endif
+
+/* NOLINTEND(readability-identifier-naming,modernize-*) */
 
 #endif /* TONEWERK_REPORTING_H */

@@ -15,8 +15,6 @@
 namespace tonewerk {
 namespace {
 
-using testing::Optional;
-
 // A payload of one text entry, `size` bytes long in all, told apart by its fill.
 class Text {
  public:

@@ -253,7 +253,8 @@ Value withoutZeros(const Value& value) {
 ValueMap withoutZeros(const ValueMap& map) {
   ValueMap made;
   for (const ValueMapEntry& entry : map) {
-    made.set(std::string(std::string(entry.key).c_str()), withoutZeros(entry.value));
+    const std::string_view key = entry.key;
+    made.set(key.substr(0, key.find('\0')), withoutZeros(entry.value));
   }
   return made;
 }
