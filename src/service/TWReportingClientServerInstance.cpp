@@ -7,6 +7,7 @@
 
 #include "platform/LogLine.h"
 #include "platform/SerialQueue.h"
+#include "service/MessageWatch.h"
 #include "service/TWReportingServiceDelegateProtocol.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionMessage.h"
@@ -170,8 +171,10 @@ void TWReportingClientServerInstance::sendMessage(ValueMap message, AudioEventCa
                   ValueMap payload = message;
                   // The last session then holds it alone, and need not copy it to change it.
                   if (at + 1 == sessions.size()) message = ValueMap();
-                  sessions[at]->sendMessage(
-                      std::make_shared<TWReportingSessionMessage>(std::move(payload), messageCategory, type));
+                  const auto record =
+                      std::make_shared<TWReportingSessionMessage>(std::move(payload), messageCategory, type);
+                  sessions[at]->sendMessage(record);
+                  delegate.messageWatch().note(*sessions[at], *record);
                 }
                 reply(std::nullopt);
               });

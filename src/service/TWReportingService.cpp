@@ -14,6 +14,7 @@
 #include "service/ClientUptime.h"
 #include "service/TWReportingClientServerInstance.h"
 #include "service/TWReportingServiceExport.h"
+#include "service/WatchExport.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingSession.h"
@@ -55,8 +56,10 @@ bool TWReportingService::listenerShouldAcceptNewConnection(MessagingConnection& 
       const auto listed = weakClient.lock();
       if (service != nullptr && listed != nullptr) registerClient(listed);
     });
-    connection.exportObject(TWReportingServiceExport::exportedInterface(),
-                            std::make_shared<TWReportingServiceExport>(std::move(client)));
+    connection.exportObject(
+        TWReportingServiceExport::exportedInterface(),
+        std::make_shared<TWReportingServiceExport>(
+            std::move(client), std::make_unique<WatchExport>(processIdentifier, weak_from_this())));
   }
   connection.setInterruptionHandler([weakClient] {
     infoLog(category(), "interruptionHandler: connection exited");
@@ -144,6 +147,11 @@ TWReportingService::Session TWReportingService::singleMessageSession() {
         });
   }
   singleMessageSessionLastRetrieved_ = now();
+  return singleMessageSession_;
+}
+
+TWReportingService::Session TWReportingService::currentSingleMessageSession() const {
+  const std::lock_guard lock(singleMessageMutex_);
   return singleMessageSession_;
 }
 

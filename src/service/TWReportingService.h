@@ -10,6 +10,7 @@
 
 #include "platform/MessagingListener.h"
 #include "platform/TimerService.h"
+#include "service/MessageWatch.h"
 #include "service/TWReportingServiceDelegateProtocol.h"
 
 namespace tonewerk {
@@ -39,10 +40,12 @@ class TWReportingService final : public MessagingListenerDelegate,
   std::vector<Session> findReportingSessionsForIDs(
       const std::optional<std::vector<ReporterID>>& reporterIDs) override;
   std::vector<Session> getAllActiveReportingSessions() override;
+  Session currentSingleMessageSession() const override;
   const std::vector<Client>& getAllClients() const override { return clients_; }
   bool isReportingEnabled() const override { return reportingEnabled_; }
   void removeClient(const TWReportingClientServerInstance& client) override;
   void logReportingSessions() override;
+  MessageWatch& messageWatch() override { return messageWatch_; }
   void endProcess() override { endProcess_(); }
 
   // The reaper's tick, twice a second on its thread: takes out the single-message session when it was last
@@ -64,10 +67,11 @@ class TWReportingService final : public MessagingListenerDelegate,
   const std::function<void()> endProcess_;
   std::atomic<bool> reportingEnabled_ = true;
   std::vector<Client> clients_;  // in order of connection; on the work queue
+  MessageWatch messageWatch_;    // likewise
 
   std::mutex mutex_;  // guards the making of a client and every search for a session
 
-  std::mutex singleMessageMutex_;  // guards what follows
+  mutable std::mutex singleMessageMutex_;  // guards what follows
   Session singleMessageSession_;
   std::optional<double> singleMessageSessionLastRetrieved_;  // seconds since 1970
   std::unique_ptr<Timer> singleMessageSessionReaper_;

@@ -9,6 +9,7 @@
 
 namespace tonewerk {
 
+class MessageWatch;
 class TWReportingClientServerInstance;
 class TWReportingSession;
 
@@ -32,6 +33,9 @@ class TWReportingServiceDelegateProtocol {
   // The started sessions of all clients.
   virtual std::vector<Session> getAllActiveReportingSessions() = 0;
 
+  // The single-message session while there is one, else null.
+  virtual Session currentSingleMessageSession() const = 0;
+
   // In order of connection.
   virtual const std::vector<Client>& getAllClients() const = 0;
 
@@ -40,6 +44,9 @@ class TWReportingServiceDelegateProtocol {
 
   virtual void removeClient(const TWReportingClientServerInstance& client) = 0;
   virtual void logReportingSessions() = 0;
+
+  // Whoever watches the messages that clients send.
+  virtual MessageWatch& messageWatch() = 0;
 
   // Ends the process with the exit status 2 once what the sinks were handed is written; stops no session. Any
   // thread.

@@ -2,6 +2,9 @@
 #include "service/TWReportingServiceExport.h"
 
 #include <utility>
+#include <vector>
+
+#include "service/WatchExport.h"
 
 namespace tonewerk {
 namespace {
@@ -19,6 +22,7 @@ enum ServiceMethod : std::size_t {
   kReporterIDValid,
   kGetAllReporters,
   kKillService,
+  kFirstWatchMethod,
 };
 
 // Of a list of reporter identifiers: what some ten clients with all the sessions they may have come to.
@@ -38,34 +42,49 @@ TWReportingServiceProtocol::ReporterIDs reporterIDsOf(const Argument& argument) 
   return identifiers;
 }
 
+std::vector<Method> requestSet() {
+  constexpr Parameter kReporterID{"reporterID", ParameterType::kInt64};
+  return {
+      {"createReportingSession", {kReporterID}},
+      {"setServiceType", {{"serviceType", ParameterType::kUInt16}, kReporterID}},
+      {"getServiceNameForReporterID", {kReporterID}},
+      {"setConfiguration", {{"configuration", ParameterType::kMap}, kReporterID}},
+      {"startReportingSessionForID", {kReporterID}},
+      {"sendMessage",
+       {{"message", ParameterType::kMap},
+        {"category", ParameterType::kUInt32},
+        {"type", ParameterType::kUInt16},
+        {"reporterIDs", ParameterType::kInt64ListOrNone}}},
+      {"stopReportingSessionForID", {kReporterID}},
+      {"destroyReportingSession", {kReporterID}},
+      {"reporterIDValid", {kReporterID}},
+      {"getAllReporters", {}, kMostListBytes},
+      {"killService", {}},
+  };
+}
+
 }  // namespace
 
-TWReportingServiceExport::TWReportingServiceExport(std::shared_ptr<TWReportingServiceProtocol> object)
-    : object_(std::move(object)) {}
+TWReportingServiceExport::TWReportingServiceExport(std::shared_ptr<TWReportingServiceProtocol> object,
+                                                   std::unique_ptr<ExportedObject> watch)
+    : object_(std::move(object)), watch_(std::move(watch)) {}
 
 const ExportedInterface& TWReportingServiceExport::exportedInterface() {
-  constexpr Parameter kReporterID{"reporterID", ParameterType::kInt64};
-  static const ExportedInterface interface {
-    {
-      {"createReportingSession", {kReporterID}},
-          {"setServiceType", {{"serviceType", ParameterType::kUInt16}, kReporterID}},
-          {"getServiceNameForReporterID", {kReporterID}},
-          {"setConfiguration", {{"configuration", ParameterType::kMap}, kReporterID}},
-          {"startReportingSessionForID", {kReporterID}},
-          {"sendMessage",
-           {{"message", ParameterType::kMap},
-            {"category", ParameterType::kUInt32},
-            {"type", ParameterType::kUInt16},
-            {"reporterIDs", ParameterType::kInt64ListOrNone}}},
-          {"stopReportingSessionForID", {kReporterID}}, {"destroyReportingSession", {kReporterID}},
-          {"reporterIDValid", {kReporterID}}, {"getAllReporters", {}, kMostListBytes}, {"killService", {}},
-    }
-  };
+  static const ExportedInterface interface = [] {
+    ExportedInterface all{requestSet()};
+    const std::vector<Method>& watch = WatchExport::methods();
+    all.methods.insert(all.methods.end(), watch.begin(), watch.end());
+    return all;
+  }();
   return interface;
 }
 
 void TWReportingServiceExport::handleRequest(std::size_t method, Arguments arguments, Reply reply,
                                              RequestToken token) {
+  if (method >= kFirstWatchMethod) {
+    return watch_->handleRequest(method - kFirstWatchMethod, std::move(arguments), std::move(reply),
+                                 std::move(token));
+  }
   ServiceRequest request{std::move(reply), std::move(token)};
   switch (method) {
     case kCreateReportingSession:

@@ -81,6 +81,7 @@ void TWReportingSession::start() {
   }
   debugLog(TWReportingSessionCategory(), "self.started==false. starting. reporterID=%lli", reporterID_);
   started_ = true;
+  startedAt_ = TWReportingContext::current().platform().clock.monotonic();
   emitTracePoint(TWReportingTracePoint::kSessionStarted);
   startWorkersFromClasses(TWReportingContext::current().workerRegistry().validClasses());
 }
@@ -165,6 +166,7 @@ void TWReportingSession::sendMessage(const std::shared_ptr<TWReportingSessionMes
   emitTracePoint(TWReportingTracePoint::kMessageReceived);
   message->isSessionStarted = started_;
   message->isRedundant = messageIsRedundant(*message);
+  if (message->isRedundant) ++redundantMessageCount_;
   debugLog(
       TWReportingSessionCategory(),
       "TWReportingSessionWorker action=sendMessage reporterID=%lli app=%@ redundant=%@ message=%@",
@@ -210,7 +212,9 @@ void TWReportingSession::stop() {
   }
   forgetMessages();
   totalMessageCount_ = 0;
+  redundantMessageCount_ = 0;
   started_ = false;
+  startedAt_.reset();
 }
 
 std::shared_ptr<TWReportingSessionMessage> TWReportingSession::lifecycleMessage(

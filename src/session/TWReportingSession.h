@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <chrono>
 #include <cstdint>
 #include <functional>
 #include <map>
@@ -94,7 +95,11 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   void addPreviousValues(const ValueMap& values);
   // Not redundant ones, in order of arrival; sorted by time while the session stops.
   const TWReportingSessionMessages& messages() const { return messages_; }
+  // Received since the session was made or last stopped, and how many of them were redundant.
   std::uint64_t totalMessageCount() const { return totalMessageCount_; }
+  std::uint64_t redundantMessageCount() const { return redundantMessageCount_; }
+  // Monotonic time; none while it is not started.
+  std::optional<std::chrono::nanoseconds> startedAt() const { return startedAt_; }
   bool started() const { return started_; }
   bool isSingleMessageSession() const { return isSingleMessageSession_; }
   void setSingleMessageSession(bool isSingle) { isSingleMessageSession_ = isSingle; }
@@ -135,6 +140,8 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   bool started_ = false;
   bool isSingleMessageSession_ = false;
   std::uint64_t totalMessageCount_ = 0;
+  std::uint64_t redundantMessageCount_ = 0;
+  std::optional<std::chrono::nanoseconds> startedAt_;
 
   TWReportingSessionMessages messages_;
   // The newest stored message of each category and type. Ordered: clients choose the keys, and must not be

@@ -166,13 +166,29 @@ TEST_F(TWReportingSessionTest, StartingAgainAddsOnlyASecondStartMessage) {
   EXPECT_THAT(test.log.linesOf("twrr", LogLevel::kInfo), SizeIs(2));
 }
 
+TEST_F(TWReportingSessionTest, KnowsSinceWhenItIsStarted) {
+  const auto session = makeSession();
+  EXPECT_EQ(session->startedAt(), std::nullopt);
+  test.clock.advance(5);
+  const auto start = test.clock.monotonic();
+  session->start();
+  test.clock.advance(5);
+  session->start();  // changes nothing
+  EXPECT_EQ(session->startedAt(), start);
+  session->stop();
+  EXPECT_EQ(session->startedAt(), std::nullopt);
+}
+
 TEST_F(TWReportingSessionTest, StopForgetsTheMessagesAndCountsAndMayBeFollowedByAStart) {
   const auto session = makeSession();
   session->start();
   session->sendMessage(message({{"a", 1}}));
+  session->sendMessage(message({{"a", 1}}));
+  EXPECT_EQ(session->redundantMessageCount(), 1U);
   session->stop();
   EXPECT_THAT(session->messages(), IsEmpty());
   EXPECT_EQ(session->totalMessageCount(), 0U);
+  EXPECT_EQ(session->redundantMessageCount(), 0U);
   EXPECT_FALSE(session->started());
   EXPECT_EQ(session->previousValues().integer("a"), 1);
   session->start();

@@ -6,6 +6,7 @@
 
 #include "platform/linux/RpcLimits.h"
 #include "platform/linux/RpcPacker.h"
+#include "values/Nesting.h"
 
 namespace tonewerk {
 namespace {
@@ -88,19 +89,6 @@ class ValuePacker : public RpcPacker<Output> {
   }
 };
 
-bool fits(const Value& value, std::size_t depthLeft) {
-  if (const ValueArray* array = value.asArray()) {
-    return depthLeft > 0 && std::all_of(array->begin(), array->end(),
-                                        [&](const Value& element) { return fits(element, depthLeft - 1); });
-  }
-  if (const ValueMap* map = value.asMap()) {
-    return depthLeft > 0 && std::all_of(map->begin(), map->end(), [&](const ValueMapEntry& entry) {
-             return fits(entry.value, depthLeft - 1);
-           });
-  }
-  return true;
-}
-
 }  // namespace
 
 void RpcWriter::request(std::uint32_t identifier, std::string_view method, const Arguments& arguments) {
@@ -141,7 +129,7 @@ void RpcWriter::response(std::uint32_t identifier, const std::optional<ReplyErro
 bool fitsFrameDepth(const Arguments& arguments) {
   constexpr std::size_t kFrameAndArguments = 2;
   return std::all_of(arguments.begin(), arguments.end(), [](const Argument& argument) {
-    return !argument || fits(*argument, kMostFrameDepth - kFrameAndArguments);
+    return !argument || nestsWithin(*argument, kMostFrameDepth - kFrameAndArguments);
   });
 }
 

@@ -8,20 +8,13 @@
 #include <utility>
 
 #include "platform/LogLine.h"
+#include "values/ShortenedText.h"
 
 namespace tonewerk {
 namespace {
 
 // Of a method that nobody knows, in the answer that says so.
 constexpr std::size_t kMostMethodNameBytes = 64;
-
-// The start of `text`, cut between two characters.
-std::string_view shortened(std::string_view text) {
-  if (text.size() <= kMostMethodNameBytes) return text;
-  std::size_t end = kMostMethodNameBytes;
-  while (end > 0 && (static_cast<unsigned char>(text[end]) & 0xC0U) == 0x80U) --end;
-  return text.substr(0, end);
-}
 
 std::string problemText(const Method& method, const RefusedValue& refused) {
   std::string text = std::string(method.name) + ": argument " + std::to_string(refused.argument + 1);
@@ -137,7 +130,8 @@ void UnixConnection::dispatch(RpcFrame& frame) {
 std::optional<ReplyError> UnixConnection::problemWithFrame(const RpcFrame& frame,
                                                            std::optional<std::size_t> method) const {
   if (!method)
-    return messagingError(kUnknownMethod, "unknown method " + std::string(shortened(frame.method)));
+    return messagingError(kUnknownMethod,
+                          "unknown method " + std::string(shortened(frame.method, kMostMethodNameBytes)));
   const Method& known = interface_->methods[*method];
   if (auto problem = problemWithCaller(known, userIdentifier_, context_.owner)) return problem;
   if (frame.refused) return messagingError(kInvalidArguments, problemText(known, *frame.refused));

@@ -1,0 +1,25 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "service/MessageWatch.h"
+
+#include <algorithm>
+
+#include "service/MessageWatcher.h"
+
+namespace tonewerk {
+
+void MessageWatch::add(const std::shared_ptr<MessageWatcher>& watcher) {
+  const auto isListed = [&](const auto& listed) { return listed.lock() == watcher; };
+  if (std::none_of(watchers_.begin(), watchers_.end(), isListed)) watchers_.push_back(watcher);
+}
+
+void MessageWatch::offer(const TWReportingSession& session, const TWReportingSessionMessage& message) {
+  bool oneHasGone = false;
+  for (const auto& listed : watchers_) {
+    const auto watcher = listed.lock();
+    oneHasGone = oneHasGone || watcher == nullptr;
+    if (watcher != nullptr) watcher->offer(session, message);
+  }
+  if (oneHasGone) std::erase_if(watchers_, [](const auto& listed) { return listed.expired(); });
+}
+
+}  // namespace tonewerk

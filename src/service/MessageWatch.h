@@ -1,0 +1,31 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <memory>
+#include <vector>
+
+namespace tonewerk {
+
+class MessageWatcher;
+class TWReportingSession;
+class TWReportingSessionMessage;
+
+// Who watches the messages that clients send. Those that the daemon derives itself are not shown: they appear
+// where they go, in the reports. On the work queue.
+class MessageWatch {
+ public:
+  // Held weakly: a watcher goes with its connection. Once is enough.
+  void add(const std::shared_ptr<MessageWatcher>& watcher);
+
+  // `message` has been received, judged and delivered by `session`.
+  void note(const TWReportingSession& session, const TWReportingSessionMessage& message) {
+    if (!watchers_.empty()) offer(session, message);
+  }
+
+ private:
+  void offer(const TWReportingSession& session, const TWReportingSessionMessage& message);
+
+  std::vector<std::weak_ptr<MessageWatcher>> watchers_;
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,104 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "service/MessageWatcher.h"
+
+#include <utility>
+#include <vector>
+
+#include "platform/SerialQueue.h"
+#include "service/WatchKeys.h"
+#include "session/TWReportingKeys.h"
+#include "session/TWReportingSession.h"
+#include "session/TWReportingSessionMessage.h"
+#include "session/TWReportingUtility.h"
+#include "values/Nesting.h"
+
+namespace tonewerk {
+
+void MessageWatcher::open(MessageFilter filter) {
+  isOpen_ = true;
+  filter_ = std::move(filter);
+  waiting_.clear();
+  waitingBytes_ = 0;
+  missed_ = 0;
+}
+
+void MessageWatcher::offer(const TWReportingSession& session, const TWReportingSessionMessage& message) {
+  if (!filter_.wants(session.reporterID(), message.category, message.type)) return;
+  SeenMessage seen{session.reporterID(), session.serviceType(), message.category,
+                   message.type,         message.isRedundant,   message.message};
+  if (seen.bytes() > kMostAnswerBytes) {
+    ++missed_;
+  } else {
+    keep(std::move(seen));
+  }
+  // Answered behind the work that is queued already, so that what comes in a flood goes in few answers.
+  if (!isHeld_ || std::exchange(answerIsQueued_, true)) return;
+  TWReportingUtilityGetReportingServerQueue().async([held = weak_from_this()] {
+    if (const auto watcher = held.lock()) watcher->answerWithNews();
+  });
+}
+
+// The oldest give way: who watches wants to see what happens now.
+void MessageWatcher::keep(SeenMessage message) {
+  waitingBytes_ += message.bytes();
+  waiting_.push_back(std::move(message));
+  while (waiting_.size() > kMostMessages || waitingBytes_ > kMostBytes) {
+    takeOldest();
+    ++missed_;
+  }
+}
+
+MessageWatcher::SeenMessage MessageWatcher::takeOldest() {
+  SeenMessage oldest = std::move(waiting_.front());
+  waiting_.pop_front();
+  waitingBytes_ -= oldest.bytes();
+  return oldest;
+}
+
+void MessageWatcher::next(Reply reply, RequestToken token) {
+  if (isHeld_) answerHeld();
+  if (hasNews()) return reply(std::nullopt, takeAnswer());
+  isHeld_ = true;
+  heldReply_ = std::move(reply);
+  heldToken_ = std::move(token);
+}
+
+void MessageWatcher::answerWithNews() {
+  answerIsQueued_ = false;
+  if (hasNews()) answerHeld();  // an earlier answer may have taken them
+}
+
+void MessageWatcher::answerHeld() {
+  if (!std::exchange(isHeld_, false)) return;
+  heldReply_(std::nullopt, takeAnswer());
+  heldReply_ = Reply();
+  heldToken_ = RequestToken();
+}
+
+ValueMap MessageWatcher::takeAnswer() {
+  std::vector<Value> messages;
+  std::size_t bytes = 0;
+  while (!waiting_.empty() && bytes + waiting_.front().bytes() <= kMostAnswerBytes) {
+    const SeenMessage oldest = takeOldest();
+    if (!nestsWithin(oldest.payload, kMostPayloadLevels)) {
+      ++missed_;
+      continue;
+    }
+    bytes += oldest.bytes();
+    messages.emplace_back(oldest.shown());
+  }
+  return {{kWatchKeyMissed, std::exchange(missed_, 0)}, {kWatchKeyMessages, ValueArray(std::move(messages))}};
+}
+
+ValueMap MessageWatcher::SeenMessage::shown() const {
+  return {{kWatchKeyReporterID, reporterID},
+          {kWatchKeyServiceType, serviceType},
+          {kWatchKeyCategory, category},
+          {kWatchKeyType, type},
+          {kWatchKeyRedundant, isRedundant},
+          {kWatchKeyTime, payload.number(TWReportingInternalEventEpochTime)},
+          {kWatchKeyApplication, shownApplication(payload)},
+          {kWatchKeyPayload, payload}};
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,79 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "service/SessionListing.h"
+
+#include <chrono>
+#include <memory>
+#include <optional>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "platform/Clock.h"
+#include "service/TWReportingClientServerInstance.h"
+#include "service/TWReportingServiceDelegateProtocol.h"
+#include "service/WatchKeys.h"
+#include "session/TWReportingContext.h"
+#include "session/TWReportingSession.h"
+
+namespace tonewerk {
+namespace {
+
+// A portion of a long row.
+class Portion {
+ public:
+  explicit Portion(std::size_t first) : first_(first) {}
+
+  // Whether none of the next `count` is in it; they are then passed.
+  bool passes(std::size_t count) {
+    if (passed_ + count > first_ && listed_.size() < kMostListedSessions) return false;
+    passed_ += count;
+    return true;
+  }
+  void add(const TWReportingSession& session, const std::optional<std::string>& processName);
+
+  ValueMap answer() {
+    return {{kWatchKeyTotal, passed_}, {kWatchKeySessions, ValueArray(std::move(listed_))}};
+  }
+
+ private:
+  const std::size_t first_;
+  const std::chrono::nanoseconds now_ = TWReportingContext::current().platform().clock.monotonic();
+  std::size_t passed_ = 0;
+  std::vector<Value> listed_;
+};
+
+void Portion::add(const TWReportingSession& session, const std::optional<std::string>& processName) {
+  if (passes(1)) return;
+  ++passed_;
+  ValueMap shown{{kWatchKeyReporterID, session.reporterID()},
+                 {kWatchKeyServiceType, session.serviceType()},
+                 {kWatchKeyServiceName, session.serviceName()},
+                 {kWatchKeyStarted, session.started()},
+                 {kWatchKeySingleMessageSession, session.isSingleMessageSession()},
+                 {kWatchKeyApplication, shownApplication(session.configuration())},
+                 {kWatchKeyMessages, session.totalMessageCount()},
+                 {kWatchKeyRedundant, session.redundantMessageCount()}};
+  if (!session.processIdentifiers().empty()) {
+    shown.set(kWatchKeyProcessIdentifier, session.processIdentifiers().front());
+  }
+  if (processName) shown.set(kWatchKeyProcessName, shortened(*processName, kMostShownNameBytes));
+  if (const auto since = session.startedAt()) {
+    shown.set(kWatchKeySeconds, std::chrono::duration<double>(now_ - *since).count());
+  }
+  listed_.emplace_back(std::move(shown));
+}
+
+}  // namespace
+
+ValueMap sessionListing(const TWReportingServiceDelegateProtocol& service, std::size_t first) {
+  Portion portion(first);
+  for (const auto& client : service.getAllClients()) {
+    const auto& sessions = client->clientReportingSessionMap();
+    if (portion.passes(sessions.size())) continue;
+    for (const auto& [reporterID, session] : sessions) portion.add(*session, client->clientProcessName());
+  }
+  if (const auto session = service.currentSingleMessageSession()) portion.add(*session, std::nullopt);
+  return portion.answer();
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,41 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstddef>
+#include <string_view>
+
+#include "session/TWReportingUtility.h"
+#include "values/ShortenedText.h"
+#include "values/Value.h"
+
+namespace tonewerk {
+
+// Keys of the answers to who watches the daemon.
+inline const SharedString kWatchKeyMissed("missed");
+inline const SharedString kWatchKeyMessages("messages");
+inline const SharedString kWatchKeyReporterID("reporterID");
+inline const SharedString kWatchKeyServiceType("serviceType");
+inline const SharedString kWatchKeyServiceName("serviceName");
+inline const SharedString kWatchKeyCategory("category");
+inline const SharedString kWatchKeyType("type");
+inline const SharedString kWatchKeyRedundant("redundant");
+inline const SharedString kWatchKeyTime("time");
+inline const SharedString kWatchKeyApplication("application");
+inline const SharedString kWatchKeyPayload("payload");
+inline const SharedString kWatchKeyTotal("total");
+inline const SharedString kWatchKeySessions("sessions");
+inline const SharedString kWatchKeyStarted("started");
+inline const SharedString kWatchKeySingleMessageSession("singleMessageSession");
+inline const SharedString kWatchKeyProcessIdentifier("processIdentifier");
+inline const SharedString kWatchKeyProcessName("processName");
+inline const SharedString kWatchKeySeconds("seconds");
+
+// Names that clients choose are shown this long and no longer.
+inline constexpr std::size_t kMostShownNameBytes = 256;
+
+// The application that a configuration, or a payload on its way to the workers, names.
+inline Value shownApplication(const ValueMap& map) {
+  return shortened(TWReportingUtilityRetrieveAppName(map), kMostShownNameBytes);
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,257 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "service/MessageWatcher.h"
+
+#include <memory>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "support/ReportingTest.h"
+
+namespace tonewerk {
+namespace {
+
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+using ::testing::SizeIs;
+
+// What a watcher answered, in order.
+class Answers final : public ReplySink {
+ public:
+  void reply(std::uint32_t /*requestIdentifier*/, const std::optional<ReplyError>& error,
+             const std::optional<Value>& result) override {
+    ASSERT_FALSE(error);
+    ASSERT_TRUE(result && result->asMap());
+    all.push_back(*result->asMap());
+  }
+  std::vector<ValueMap> all;
+};
+
+// Counts requests that are finished.
+class Gauge final : public RequestGauge {
+ public:
+  void finished(std::size_t /*bytes*/) override { ++count; }
+  int count = 0;
+};
+
+class MessageWatcherTest : public ReportingTest {
+ protected:
+  MessageWatcherTest() {
+    session->setServiceType(7);
+    watcher->open({});
+  }
+
+  void offer(ValueMap payload, AudioEventCategory category = 4, AudioEventType type = 1) {
+    watcher->offer(*session, TWReportingSessionMessage(std::move(payload), category, type));
+  }
+  void offerNumbers(int first, int last) {
+    for (int number = first; number <= last; ++number) offer({{"number", number}});
+  }
+  void ask() { watcher->next(Reply(answers, 1), RequestToken(gauge, 0)); }
+  // Asks, and takes the answer out; empty when there is none yet.
+  ValueMap next() {
+    answers->all.clear();
+    ask();
+    return answers->all.empty() ? ValueMap() : answers->all.back();
+  }
+
+  static std::vector<std::int64_t> numbersIn(const ValueMap& answer) {
+    std::vector<std::int64_t> numbers;
+    for (const Value& message : *answer.find("messages")->asArray()) {
+      numbers.push_back(message.asMap()->find("payload")->asMap()->integer("number"));
+    }
+    return numbers;
+  }
+  // Of `levels` maps inside each other.
+  static ValueMap nested(std::size_t levels) {
+    ValueMap map{{"number", 1}};
+    for (std::size_t level = 1; level < levels; ++level) map = ValueMap{{"inner", map}};
+    return map;
+  }
+
+  std::shared_ptr<TWReportingSession> session = makeSession(77);
+  std::shared_ptr<MessageWatcher> watcher = std::make_shared<MessageWatcher>();
+  std::shared_ptr<Answers> answers = std::make_shared<Answers>();
+  std::shared_ptr<Gauge> gauge = std::make_shared<Gauge>();
+};
+
+TEST_F(MessageWatcherTest, SaysWhatArrivedWhereAndWhen) {
+  TWReportingSessionMessage record(
+      {{"twreporting_timestamp", 1763634000.5}, {"HostApplicationDisplayID", "com.example.player"}}, 4, 1);
+  record.isRedundant = true;
+  watcher->offer(*session, record);
+  EXPECT_EQ(next().text(),
+            R"({"missed":0,"messages":[{"reporterID":77,"serviceType":7,"category":4,"type":1,)"
+            R"("redundant":true,"time":1763634000.5,"application":"com.example.player","payload":)"
+            R"({"twreporting_timestamp":1763634000.5,"HostApplicationDisplayID":"com.example.player"}}]})");
+}
+
+TEST_F(MessageWatcherTest, GivesEachMessageOnceInOrder) {
+  offerNumbers(1, 3);
+  EXPECT_THAT(numbersIn(next()), ElementsAre(1, 2, 3));
+  offerNumbers(4, 4);
+  EXPECT_THAT(numbersIn(next()), ElementsAre(4));
+  EXPECT_EQ(watcher->waitingBytes(), 0U);
+}
+
+TEST_F(MessageWatcherTest, CopiesNoPayload) {
+  const ValueMap payload{{"number", 1}};
+  offer(payload);
+  const ValueMap answer = next();
+  const ValueMap& message = *answer.find("messages")->asArray()->begin()->asMap();
+  EXPECT_TRUE(message.find("payload")->asMap()->sharesStorageWith(payload));
+}
+
+TEST_F(MessageWatcherTest, HoldsARequestBackUntilThereIsSomething) {
+  ask();
+  test.queues.runAll();
+  EXPECT_THAT(answers->all, IsEmpty());
+  EXPECT_EQ(gauge->count, 0);
+  offerNumbers(1, 1);
+  test.queues.runAll();
+  ASSERT_THAT(answers->all, SizeIs(1));
+  EXPECT_THAT(numbersIn(answers->all[0]), ElementsAre(1));
+  EXPECT_EQ(gauge->count, 1);
+  offerNumbers(2, 2);
+  test.queues.runAll();
+  EXPECT_THAT(answers->all, SizeIs(1)) << "answered twice";
+}
+
+TEST_F(MessageWatcherTest, AnswersAHeldRequestOnceForAllThatIsQueuedByThen) {
+  ask();
+  offerNumbers(1, 3);
+  EXPECT_THAT(answers->all, IsEmpty());
+  test.queues.runAll();
+  ASSERT_THAT(answers->all, SizeIs(1));
+  EXPECT_THAT(numbersIn(answers->all[0]), ElementsAre(1, 2, 3));
+}
+
+TEST_F(MessageWatcherTest, AnswersTheHeldRequestWithNothingWhenAnotherComes) {
+  ask();
+  ask();
+  ASSERT_THAT(answers->all, SizeIs(1));
+  EXPECT_EQ(answers->all[0].text(), R"({"missed":0,"messages":[]})");
+  EXPECT_EQ(gauge->count, 1);
+  offerNumbers(1, 1);
+  test.queues.runAll();
+  ASSERT_THAT(answers->all, SizeIs(2));
+  EXPECT_THAT(numbersIn(answers->all[1]), ElementsAre(1));
+}
+
+TEST_F(MessageWatcherTest, DoesNotAnswerTheLaterRequestWithNothingWhenTheEarlierTookAll) {
+  ask();
+  offerNumbers(1, 1);
+  ask();  // the first is answered now, with what has arrived
+  test.queues.runAll();
+  ASSERT_THAT(answers->all, SizeIs(1));
+  EXPECT_THAT(numbersIn(answers->all[0]), ElementsAre(1));
+  offerNumbers(2, 2);
+  test.queues.runAll();
+  ASSERT_THAT(answers->all, SizeIs(2));
+  EXPECT_THAT(numbersIn(answers->all[1]), ElementsAre(2));
+}
+
+TEST_F(MessageWatcherTest, ShowsOnlyWhatIsWanted) {
+  watcher->open({{77}, {4, 5}, {1}});
+  offer({{"number", 1}}, 4, 1);
+  offer({{"number", 2}}, 6, 1);
+  offer({{"number", 3}}, 5, 2);
+  offer({{"number", 4}}, 5, 1);
+  EXPECT_THAT(numbersIn(next()), ElementsAre(1, 4));
+  watcher->open({{78}, {}, {}});
+  offerNumbers(5, 5);
+  EXPECT_EQ(next(), ValueMap());
+}
+
+TEST_F(MessageWatcherTest, HoldsSoManyMessagesAndMissesTheOldest) {
+  const int most = static_cast<int>(MessageWatcher::kMostMessages);
+  offerNumbers(1, most);
+  EXPECT_EQ(watcher->waitingMessages(), MessageWatcher::kMostMessages);
+  offerNumbers(most + 1, most + 2);
+  EXPECT_EQ(watcher->waitingMessages(), MessageWatcher::kMostMessages);
+  const ValueMap answer = next();
+  EXPECT_EQ(answer.integer("missed"), 2);
+  EXPECT_EQ(numbersIn(answer).front(), 3);
+  EXPECT_EQ(next().integer("missed"), 0) << "told twice";
+}
+
+TEST_F(MessageWatcherTest, HoldsSoManyBytesAndMissesTheOldest) {
+  const std::string text(100'000, 'x');
+  for (int number = 1; number <= 50; ++number) offer({{"number", number}, {"text", text}});
+  EXPECT_LE(watcher->waitingBytes(), MessageWatcher::kMostBytes);
+  EXPECT_EQ(watcher->waitingMessages(), 41U);
+  std::vector<std::int64_t> numbers;
+  std::int64_t missed = 0;
+  while (watcher->waitingMessages() > 0) {
+    const ValueMap answer = next();
+    missed += answer.integer("missed");
+    for (const std::int64_t number : numbersIn(answer)) numbers.push_back(number);
+  }
+  EXPECT_EQ(missed, 9);
+  EXPECT_THAT(numbers, SizeIs(41));
+  EXPECT_EQ(numbers.front(), 10);
+  EXPECT_EQ(numbers.back(), 50);
+}
+
+TEST_F(MessageWatcherTest, AnAnswerComesToNoMoreThanItsBound) {
+  const std::string text(200'000, 'x');
+  for (int number = 1; number <= 5; ++number) offer({{"number", number}, {"text", text}});
+  EXPECT_THAT(numbersIn(next()), ElementsAre(1, 2));
+  EXPECT_THAT(numbersIn(next()), ElementsAre(3, 4));
+  EXPECT_THAT(numbersIn(next()), ElementsAre(5));
+}
+
+TEST_F(MessageWatcherTest, MissesAMessageThatNoAnswerHolds) {
+  ValueMap payload{{"number", 1}, {"text", ""}};
+  const std::size_t room = MessageWatcher::kMostAnswerBytes - MessageWatcher::kRecordBytes - payload.bytes();
+  payload.set("text", std::string(room, 'x'));
+  offer(payload);
+  payload.set("text", std::string(room + 1, 'x'));
+  offer(payload);
+  const ValueMap answer = next();
+  EXPECT_EQ(answer.integer("missed"), 1);
+  EXPECT_THAT(numbersIn(answer), ElementsAre(1));
+}
+
+TEST_F(MessageWatcherTest, MissesAPayloadThatIsNestedTooDeepForAnAnswer) {
+  offer(nested(MessageWatcher::kMostPayloadLevels));
+  offer(nested(MessageWatcher::kMostPayloadLevels + 1));
+  const ValueMap answer = next();
+  EXPECT_EQ(answer.integer("missed"), 1);
+  EXPECT_THAT(*answer.find("messages")->asArray(), SizeIs(1));
+}
+
+TEST_F(MessageWatcherTest, AnswersAHeldRequestAlsoWhenSomethingWasOnlyMissed) {
+  ask();
+  offer({{"text", std::string(MessageWatcher::kMostAnswerBytes, 'x')}});
+  test.queues.runAll();
+  ASSERT_THAT(answers->all, SizeIs(1));
+  EXPECT_EQ(answers->all[0].text(), R"({"missed":1,"messages":[]})");
+}
+
+TEST_F(MessageWatcherTest, BeginsAnewWhenItIsOpenedAgain) {
+  offerNumbers(1, static_cast<int>(MessageWatcher::kMostMessages) + 1);
+  watcher->open({});
+  EXPECT_EQ(watcher->waitingMessages(), 0U);
+  EXPECT_EQ(watcher->waitingBytes(), 0U);
+  offerNumbers(7, 7);
+  EXPECT_EQ(next().integer("missed"), 0);
+}
+
+TEST_F(MessageWatcherTest, GoesWhileAnAnswerIsQueued) {
+  ask();
+  offerNumbers(1, 1);
+  watcher = nullptr;
+  test.queues.runAll();
+  EXPECT_THAT(answers->all, IsEmpty());
+  EXPECT_EQ(gauge->count, 1);
+}
+
+TEST_F(MessageWatcherTest, CutsALongApplicationName) {
+  offer({{"HostApplicationDisplayID", std::string(1000, 'x')}});
+  const ValueMap answer = next();
+  EXPECT_EQ(answer.find("messages")->asArray()->begin()->asMap()->text("application").size(), 256U);
+}
+
+}  // namespace
+}  // namespace tonewerk

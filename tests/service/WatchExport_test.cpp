@@ -1,0 +1,307 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "service/WatchExport.h"
+
+#include <numeric>
+#include <string>
+#include <vector>
+
+#include "service/MessageFilter.h"
+#include "service/SessionListing.h"
+#include "support/ServiceTest.h"
+
+namespace tonewerk {
+namespace {
+
+using ::testing::Contains;
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+using ::testing::SizeIs;
+
+constexpr std::uint32_t kOther = MemoryMessaging::kOwner + 1;
+const Arguments kNoFilter{std::nullopt, std::nullopt, std::nullopt};
+
+class WatchExportTest : public ServiceTest {
+ protected:
+  void send(MemoryClient& client, ValueMap message, const std::vector<ReporterID>& reporterIDs,
+            AudioEventCategory category = 4, AudioEventType type = 1) {
+    Argument recipients;
+    if (!reporterIDs.empty())
+      recipients = ValueArray(std::vector<Value>(reporterIDs.begin(), reporterIDs.end()));
+    ask(client, "sendMessage", {Value(std::move(message)), Value(category), Value(type), recipients});
+  }
+  void open(MemoryClient& client, const Arguments& filter = kNoFilter) {
+    EXPECT_EQ(askOnce(client, "watch.openMessages", filter), Value(true));
+  }
+  // The messages in the answer to a request that has one at once.
+  std::vector<ValueMap> nextMessages(MemoryClient& client) {
+    std::vector<ValueMap> messages;
+    const Value answer = askOnce(client, "watch.nextMessages", {});
+    if (answer.asMap() == nullptr) return messages;
+    for (const Value& message : *answer.asMap()->find("messages")->asArray())
+      messages.push_back(*message.asMap());
+    return messages;
+  }
+  std::vector<ReporterID> sessionsOf(const std::vector<ValueMap>& messages) {
+    std::vector<ReporterID> identifiers;
+    for (const ValueMap& message : messages) identifiers.push_back(message.integer("reporterID"));
+    return identifiers;
+  }
+  std::vector<ValueMap> listed(MemoryClient& client, std::int64_t first = 0) {
+    std::vector<ValueMap> sessions;
+    const Value answer = askOnce(client, "watch.sessions", {first});
+    total = answer.asMap()->integer("total");
+    for (const Value& session : *answer.asMap()->find("sessions")->asArray())
+      sessions.push_back(*session.asMap());
+    return sessions;
+  }
+  std::optional<ReplyError> refusalOf(MemoryClient& client, std::string_view method, Arguments arguments) {
+    const auto answers = ask(client, method, std::move(arguments));
+    EXPECT_THAT(answers, SizeIs(1));
+    return answers.empty() ? std::nullopt : answers[0].error;
+  }
+
+  std::int64_t total = 0;
+};
+
+// Who may ask.
+
+TEST_F(WatchExportTest, IsForTheDaemonsOwnUserAndRoot) {
+  const std::vector<std::pair<std::string, Arguments>> requests{
+      {"watch.sessions", {0}}, {"watch.openMessages", kNoFilter}, {"watch.nextMessages", {}}};
+  for (const auto& [method, arguments] : requests) {
+    SCOPED_TRACE(method);
+    const auto other = messaging.connect(12, kOther);
+    const auto refusal = refusalOf(*other, method, arguments);
+    ASSERT_TRUE(refusal);
+    EXPECT_EQ(*refusal,
+              messagingError(4, method + " is only for the user that the daemon runs as, and root"));
+  }
+  const auto root = messaging.connect(13, 0);
+  open(*root);
+  listed(*root);
+}
+
+// Sessions.
+
+TEST_F(WatchExportTest, SaysWhatEachSessionIsAndDoes) {
+  test.processes.setName(11, "player");
+  const auto client = connect(11);
+  create(*client, 77);
+  ask(*client, "setServiceType", {7, 77});
+  ask(*client, "setConfiguration", {ValueMap{{"HostApplicationDisplayID", "com.example.player"}}, 77});
+  ask(*client, "startReportingSessionForID", {77});
+  send(*client, {{"volume", 0.5}}, {77});
+  send(*client, {{"volume", 0.5}}, {77});
+  send(*client, {{"volume", 0.8}}, {77});
+  test.clock.advance(12.5);
+  const auto watcher = connect(12);
+  EXPECT_EQ(askOnce(*watcher, "watch.sessions", {0}).text(),
+            R"({"total":1,"sessions":[{"reporterID":77,"serviceType":7,"serviceName":")" +
+                sessionOf(0, 77)->serviceName() +
+                R"(","started":true,"singleMessageSession":false,"application":"com.example.player",)"
+                R"("messages":3,"redundant":1,"processIdentifier":11,"processName":"player",)"
+                R"("seconds":12.5}]})");
+}
+
+TEST_F(WatchExportTest, ASessionThatIsNotStartedHasNoRunningTime) {
+  const auto client = connect(11);
+  create(*client, 77);
+  const auto sessions = listed(*client);
+  ASSERT_THAT(sessions, SizeIs(1));
+  EXPECT_FALSE(sessions[0].contains("seconds"));
+  EXPECT_FALSE(sessions[0].boolean("started"));
+  EXPECT_FALSE(sessions[0].contains("processName"));
+}
+
+TEST_F(WatchExportTest, CountsAnewAfterAStop) {
+  const auto client = connect(11);
+  start(*client, 77);
+  send(*client, {{"a", 1}}, {77});
+  send(*client, {{"a", 1}}, {77});
+  ask(*client, "stopReportingSessionForID", {77});
+  const auto stopped = listed(*client);
+  ASSERT_THAT(stopped, SizeIs(1));
+  EXPECT_EQ(stopped[0].integer("messages"), 0);
+  EXPECT_EQ(stopped[0].integer("redundant"), 0);
+  EXPECT_FALSE(stopped[0].contains("seconds"));
+}
+
+TEST_F(WatchExportTest, ListsAllClientsSessionsAndTheSingleMessageSessionLast) {
+  const auto first = connect(11);
+  const auto second = connect(12);
+  create(*second, 5);
+  create(*first, 9);
+  create(*first, 8);
+  send(*second, {{"a", 1}}, {});
+  const auto sessions = listed(*first);
+  EXPECT_THAT(sessionsOf(sessions), ElementsAre(8, 9, 5, 1));
+  EXPECT_EQ(total, 4);
+  EXPECT_TRUE(sessions.back().boolean("singleMessageSession"));
+  EXPECT_EQ(sessions.back().integer("processIdentifier"), test.processes.ownProcessIdentifier());
+}
+
+TEST_F(WatchExportTest, ListsManySessionsInPortions) {
+  const auto first = connect(11);
+  const auto second = connect(12);
+  const auto most = static_cast<ReporterID>(kMostListedSessions);
+  for (ReporterID reporterID = 1; reporterID <= most; ++reporterID) create(*first, reporterID);
+  create(*second, 1001);
+  create(*second, 1002);
+  const auto portion = listed(*first);
+  EXPECT_THAT(portion, SizeIs(kMostListedSessions));
+  EXPECT_EQ(total, most + 2);
+  EXPECT_THAT(sessionsOf(listed(*first, most - 1)), ElementsAre(most, 1001, 1002));
+  EXPECT_THAT(sessionsOf(listed(*first, most)), ElementsAre(1001, 1002));
+  EXPECT_THAT(sessionsOf(listed(*first, most + 1)), ElementsAre(1002));
+  EXPECT_THAT(listed(*first, most + 2), IsEmpty());
+  EXPECT_EQ(total, most + 2);
+  EXPECT_THAT(listed(*first, -1), SizeIs(kMostListedSessions));
+}
+
+TEST_F(WatchExportTest, APortionOfTheLongestNamesFitsIntoItsBound) {
+  const auto client = connect(11);
+  test.processes.setName(12, std::string(300, 'n'));
+  const auto longNamed = connect(12);
+  const ValueMap configuration{{"HostApplicationDisplayID", std::string(5000, 'x')}};
+  for (ReporterID reporterID = 1; reporterID <= 10; ++reporterID) {
+    create(*longNamed, reporterID);
+    ask(*longNamed, "setConfiguration", {configuration, reporterID});
+  }
+  const auto sessions = listed(*client);
+  ASSERT_THAT(sessions, SizeIs(10));
+  EXPECT_EQ(sessions[0].text("application").size(), 256U);
+  EXPECT_EQ(sessions[0].text("processName").size(), 256U);
+  EXPECT_LE(sessions[0].bytes() * kMostListedSessions, kMostSessionListingBytes);
+}
+
+// Messages.
+
+TEST_F(WatchExportTest, ShowsMessagesOfEveryClientAsTheyWereStored) {
+  const auto client = connect(11);
+  start(*client, 77);
+  const auto watcher = connect(12);
+  open(*watcher);
+  send(*client, {{"two words", 1}}, {77});
+  const auto messages = nextMessages(*watcher);
+  ASSERT_THAT(messages, SizeIs(1));
+  EXPECT_EQ(messages[0].integer("reporterID"), 77);
+  EXPECT_EQ(messages[0].integer("category"), 4);
+  EXPECT_EQ(messages[0].integer("type"), 1);
+  EXPECT_EQ(messages[0].number("time"), test.clock.now());
+  EXPECT_FALSE(messages[0].boolean("redundant"));
+  EXPECT_EQ(*messages[0].find("payload")->asMap(), sessionOf(0, 77)->messages().back()->message);
+}
+
+TEST_F(WatchExportTest, MarksRedundantMessages) {
+  const auto client = connect(11);
+  start(*client, 77);
+  open(*client);
+  send(*client, {{"a", 1}}, {77});
+  send(*client, {{"a", 1}}, {77});
+  const auto messages = nextMessages(*client);
+  ASSERT_THAT(messages, SizeIs(2));
+  EXPECT_FALSE(messages[0].boolean("redundant"));
+  EXPECT_TRUE(messages[1].boolean("redundant"));
+}
+
+TEST_F(WatchExportTest, ShowsAMessageOnceForEachSessionItGoesTo) {
+  const auto client = connect(11);
+  start(*client, 77);
+  start(*client, 78);
+  open(*client);
+  send(*client, {{"a", 1}}, {});
+  EXPECT_THAT(sessionsOf(nextMessages(*client)), ElementsAre(77, 78));
+}
+
+TEST_F(WatchExportTest, ShowsMessagesOfTheSingleMessageSession) {
+  const auto client = connect(11);
+  open(*client);
+  send(*client, {{"a", 1}}, {});
+  const auto messages = nextMessages(*client);
+  EXPECT_THAT(sessionsOf(messages), ElementsAre(1));
+  EXPECT_EQ(messages.at(0).integer("serviceType"), kServiceStandalone);
+}
+
+TEST_F(WatchExportTest, FiltersInTheDaemon) {
+  const auto client = connect(11);
+  start(*client, 77);
+  start(*client, 78);
+  open(*client, {ValueArray{78}, ValueArray{5, 4}, ValueArray{1}});
+  send(*client, {{"a", 1}}, {77, 78});
+  send(*client, {{"a", 2}}, {78}, 6);
+  send(*client, {{"a", 3}}, {78}, 5, 2);
+  send(*client, {{"a", 4}}, {78}, 5);
+  const auto messages = nextMessages(*client);
+  ASSERT_THAT(messages, SizeIs(2));
+  EXPECT_EQ(messages[0].find("payload")->asMap()->integer("a"), 1);
+  EXPECT_EQ(messages[1].find("payload")->asMap()->integer("a"), 4);
+}
+
+TEST_F(WatchExportTest, AHeldRequestIsAnsweredByTheNextMessage) {
+  const auto client = connect(11);
+  start(*client, 77);
+  const auto watcher = connect(12);
+  open(*watcher);
+  EXPECT_THAT(ask(*watcher, "watch.nextMessages", {}), IsEmpty());
+  EXPECT_EQ(watcher->unfinishedRequests(), 1U);
+  send(*client, {{"a", 1}}, {77});
+  EXPECT_THAT(watcher->responses(), SizeIs(2));
+  EXPECT_EQ(watcher->unfinishedRequests(), 0U);
+}
+
+TEST_F(WatchExportTest, AWatcherGoesWithItsConnection) {
+  const auto client = connect(11);
+  start(*client, 77);
+  const auto watcher = connect(12);
+  open(*watcher);
+  const auto gone = connect(13);
+  open(*gone);
+  ask(*gone, "watch.nextMessages", {});
+  gone->disconnect();
+  run();
+  EXPECT_EQ(gone->unfinishedRequests(), 0U) << "something still holds its request";
+  send(*client, {{"a", 1}}, {77});
+  EXPECT_THAT(gone->responses(), SizeIs(1));  // that of opening
+  EXPECT_THAT(nextMessages(*watcher), SizeIs(1));
+}
+
+TEST_F(WatchExportTest, OpeningAgainShowsEachMessageOnce) {
+  const auto client = connect(11);
+  start(*client, 77);
+  open(*client);
+  open(*client);
+  send(*client, {{"a", 1}}, {77});
+  EXPECT_THAT(nextMessages(*client), SizeIs(1));
+}
+
+TEST_F(WatchExportTest, WantsToBeOpenedFirst) {
+  const auto client = connect(11);
+  EXPECT_EQ(refusalOf(*client, "watch.nextMessages", {}),
+            messagingError(2, "watch.nextMessages: watch.openMessages comes first"));
+}
+
+TEST_F(WatchExportTest, AFilterHasSoManyEntriesAndNoMore) {
+  const auto client = connect(11);
+  std::vector<Value> numbers(MessageFilter::kMostEntries - 1, Value(5));
+  open(*client, {ValueArray(numbers), ValueArray{4}, std::nullopt});
+  EXPECT_EQ(refusalOf(*client, "watch.openMessages", {ValueArray(numbers), ValueArray{4}, ValueArray{1}}),
+            messagingError(3, "the filter has 4097 entries, the most is 4096"));
+}
+
+TEST_F(WatchExportTest, NumbersThatAreNoCategoryFitNothing) {
+  const auto client = connect(11);
+  start(*client, 77);
+  // The low 32 bits are category 4's.
+  open(*client, {std::nullopt, ValueArray{(std::int64_t{1} << 32) + 4}, std::nullopt});
+  send(*client, {{"a", 1}}, {77});
+  EXPECT_THAT(ask(*client, "watch.nextMessages", {}), IsEmpty());
+}
+
+TEST_F(WatchExportTest, LogsWhoWatches) {
+  const auto client = connect(11);
+  open(*client);
+  EXPECT_THAT(test.log.textsOf("twrs", LogLevel::kInfo), Contains("client 11 watches messages"));
+}
+
+}  // namespace
+}  // namespace tonewerk
