@@ -95,6 +95,13 @@ class ManualPagesTest(unittest.TestCase):
         explained = re.findall(r"^\.It Dv (\w+)", section(page, "RETURN VALUES"), re.MULTILINE)
         self.assertEqual(explained, re.findall(r"(TWR_\w+) =", statuses))
 
+    def test_explain_every_method_of_the_protocol(self):
+        sources = [SOURCE / "src/service" / name for name in ("TWReportingServiceExport.cpp", "WatchExport.cpp")]
+        methods = {name for path in sources for name in re.findall(r'\{"([a-z][\w.]+)",\s*\{', path.read_text())}
+        self.assertGreater(len(methods), 12)
+        page = (MANUAL / "tonewerk-reporting-protocol.7").read_text()
+        self.assertEqual(methods - set(re.findall(r"^\.It Li ([\w.]+)", page, re.MULTILINE)), set())
+
     def test_refer_to_pages_that_exist(self):
         names = {page.name for page in PAGES}
         for page in PAGES:
