@@ -28,9 +28,10 @@
  * on the client's one background thread, which starts with the first of them. Without a daemon everything is
  * cheap and silent, what is queued is kept up to a bound, and twr_client_get_info() tells.
  *
- * Any function but a sender's may be called on any thread. An object must not be used while or after it is
- * destroyed. NULL for an object is allowed everywhere: the call then does nothing and returns TWR_INVALID (or
- * NULL, or 0), so that a program without memory for a client need not check each call.
+ * Any function but a sender's may be called on any thread; callers' functions must not throw. An object must
+ * not be used while or after it is destroyed. NULL for an object is allowed everywhere: the call then does
+ * nothing and returns TWR_INVALID (or NULL, or 0), so that a program without memory for a client need not
+ * check each call.
  *
  * After fork() the child's copies of the parent's objects are dead: calls return TWR_FORKED, nothing of them
  * reaches the daemon, and destroying them only frees their memory. The child may create a client of its own.
@@ -186,15 +187,19 @@ TWR_API twr_client* twr_client_create(const twr_client_options* options);
 
 /*
  * Waits up to `timeout_ms` until what is queued has gone out and the daemon has closed its end, then drops
- * the rest. The client's sessions and senders are destroyed with it; the daemon stops and reports started
- * ones.
+ * the rest; without a daemon it does not wait. The client's sessions and senders are destroyed with it; the
+ * daemon stops and reports started ones. Nothing is called any more once it has returned. Inside a callback
+ * it does nothing.
  */
 TWR_API void twr_client_destroy(twr_client* client, int timeout_ms);
 
 /* Connects now instead of with the first request. TWR_OK, TWR_NOT_CONNECTED or TWR_TIMED_OUT. */
 TWR_API twr_status twr_client_connect(twr_client* client, int timeout_ms);
 
-/* Waits until everything queued before the call has gone out. TWR_OK, TWR_NOT_CONNECTED or TWR_TIMED_OUT. */
+/*
+ * Waits until everything said before the call has gone out, senders' messages, too. TWR_OK, TWR_TIMED_OUT, or
+ * TWR_NOT_CONNECTED as soon as an attempt to connect fails.
+ */
 TWR_API twr_status twr_client_flush(twr_client* client, int timeout_ms);
 
 /* How the client is doing. Later versions may add members at the end. */
@@ -244,19 +249,27 @@ typedef struct twr_session twr_session;
 
 #define TWR_NEW_ID 0
 
-/* `reporter_id` must be of nobody else; TWR_NEW_ID chooses a random one. NULL without memory or after fork().
+/*
+ * `reporter_id` must be of nobody else; TWR_NEW_ID chooses a random one. NULL without memory, after fork(),
+ * or past 4,096 sessions of a client.
  */
 TWR_API twr_session* twr_session_create(twr_client* client, int64_t reporter_id);
 TWR_API int64_t twr_session_id(const twr_session* session);
 
-/* Results and replies as for a client's requests. A changed type makes a started session a new, stopped one.
+/*
+ * Results and replies as for a client's requests, but that what a session is to be is never lost to a full
+ * queue: it is brought about once there is room, and TWR_FULL only says that `reply` will not be called. A
+ * changed type makes a started session a new, stopped one.
  */
 TWR_API twr_status twr_session_set_service_type(twr_session* session, uint16_t service_type, twr_reply reply,
                                                 void* context);
-/* Merged into the configuration so far. */
+/* Merged into the configuration so far. TWR_TOO_LARGE when the two together do not fit a frame. */
 TWR_API twr_status twr_session_set_configuration(twr_session* session, const twr_payload* configuration,
                                                  twr_reply reply, void* context);
-/* `stopped` is called when the session stops; for one already started when the client ends. */
+/*
+ * `stopped` is called when the session stops, by a stop, a change of its type or its end; for a session that
+ * is started when the client ends, with TWR_NOT_CONNECTED.
+ */
 TWR_API twr_status twr_session_start(twr_session* session, twr_reply stopped, void* context);
 /*
  * A message that finds the queue full is dropped (TWR_FULL); the session's next one that gets through says
@@ -266,7 +279,10 @@ TWR_API twr_status twr_session_start(twr_session* session, twr_reply stopped, vo
 TWR_API twr_status twr_session_send(twr_session* session, uint32_t category, uint16_t type,
                                     const twr_payload* payload, twr_reply reply, void* context);
 TWR_API twr_status twr_session_stop(twr_session* session, twr_reply reply, void* context);
-/* Stops it where it is started. `session` and its senders are gone with the call, whatever it returns. */
+/*
+ * Stops it where it is started. `session` and its senders are gone with the call, whatever it returns (after
+ * fork() with their client).
+ */
 TWR_API twr_status twr_session_destroy(twr_session* session, twr_reply reply, void* context);
 
 /* ---- senders ---- */
@@ -280,7 +296,9 @@ typedef struct twr_sender twr_sender;
 
 enum { TWR_DEFAULT_RING_BYTES = 65536, TWR_MOST_RING_BYTES = 16777216 };
 
-/* `ring_bytes` is rounded up to a power of two; 0 for the default. Not for real-time threads. NULL as above.
+/*
+ * `ring_bytes` is rounded up to a power of two; 0 for the default. Not for real-time threads. NULL without
+ * memory, after fork(), for more than TWR_MOST_RING_BYTES, or past 4,096 senders of a client.
  */
 TWR_API twr_sender* twr_sender_open(twr_session* session, size_t ring_bytes);
 

@@ -1,0 +1,15 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "client/Backoff.h"
+
+#include <algorithm>
+
+namespace tonewerk {
+
+std::chrono::milliseconds Backoff::next() {
+  const std::chrono::milliseconds about = next_;
+  next_ = std::min(2 * next_, most_);
+  std::uniform_int_distribution<std::chrono::milliseconds::rep> within(-about.count() / 4, about.count() / 4);
+  return std::clamp(about + std::chrono::milliseconds(within(random_)), first_, most_);
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,363 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "client/ClientEngine.h"
+
+#include <algorithm>
+#include <array>
+#include <cerrno>
+#include <limits>
+#include <new>
+#include <poll.h>
+#include <random>
+#include <unistd.h>
+
+namespace tonewerk {
+namespace {
+
+using std::chrono::milliseconds;
+
+constexpr const char* kThreadName = "tw-reporting";
+constexpr std::size_t kReadBytes = std::size_t{16} * 1024;
+// Reads, and writes, in a row before the other side has its turn.
+constexpr int kMostTransfers = 16;
+
+constinit thread_local bool isCalling = false;
+
+std::uint32_t seed() {
+  const auto now = static_cast<std::uint64_t>(std::chrono::steady_clock::now().time_since_epoch().count());
+  return static_cast<std::uint32_t>(now ^ (now >> 32U) ^ static_cast<std::uint64_t>(::getpid()));
+}
+
+}  // namespace
+
+ClientEngine::ClientEngine(ClientSettings settings)
+    : settings_(std::move(settings)),
+      outbox_(settings_.queueBytes, deliveries_),
+      backoff_(settings_.firstDelay, settings_.mostDelay, seed()),
+      ringPoll_(settings_.busyPoll) {}
+
+// ---- callers ----
+
+bool ClientEngine::goOn() {
+  if (isEnding_) return true;
+  if (thread_.isRunning()) {
+    // While there is no daemon the thread has nothing to do; while the daemon reads nothing, neither.
+    if (state_ == TWR_STATE_CONNECTED && !awaitsRoom_) wake();
+    return true;
+  }
+  if (!event_.open() || !thread_.start(kThreadName, runThread, this)) return false;
+  setState(TWR_STATE_CONNECTING);
+  return true;
+}
+
+void ClientEngine::wake() {
+  if (!isSleeping_ || isWoken_) return;
+  isWoken_ = true;
+  event_.signal();
+}
+
+twr_status ClientEngine::connect(milliseconds timeout) {
+  if (isCalling) return TWR_WOULD_WAIT;
+  if (hasForked_) return TWR_FORKED;
+  Lock lock(mutex_);
+  if (state_ == TWR_STATE_CONNECTED) return TWR_OK;
+  if (state_ == TWR_STATE_ENDED) return TWR_NOT_CONNECTED;
+  const auto waiter = std::make_shared<Waiter>();
+  connectWaiters_.push_back(waiter);
+  return await(lock, waiter, timeout);
+}
+
+twr_status ClientEngine::flush(milliseconds timeout) {
+  if (isCalling) return TWR_WOULD_WAIT;
+  if (hasForked_) return TWR_FORKED;
+  Lock lock(mutex_);
+  if (outbox_.isEmpty()) return TWR_OK;
+  if (state_ == TWR_STATE_ENDED) return TWR_NOT_CONNECTED;
+  const auto waiter = std::make_shared<Waiter>();
+  outbox_.addBarrier(waiter);
+  return await(lock, waiter, timeout);
+}
+
+twr_status ClientEngine::await(Lock& lock, const std::shared_ptr<Waiter>& waiter, milliseconds timeout) {
+  // Somebody waits: not for the back-off.
+  nextAttempt_ = Clock::now();
+  if (!goOn()) return TWR_NO_MEMORY;
+  wake();
+  const auto until = Clock::now() + std::max(timeout, milliseconds::zero());
+  waiter->condition.wait_until(lock, until, [&] { return waiter->isDone; });
+  if (waiter->isDone) return waiter->status;
+  outbox_.removeBarrier(*waiter);
+  std::erase(connectWaiters_, waiter);
+  return TWR_TIMED_OUT;
+}
+
+void ClientEngine::end(milliseconds timeout) {
+  {
+    const Lock lock(mutex_);
+    isEnding_ = true;
+    endBy_ = Clock::now() + std::max(timeout, milliseconds::zero());
+    nextAttempt_ = Clock::now();
+    wake();
+  }
+  thread_.join();
+}
+
+bool ClientEngine::isInCallback() { return isCalling; }
+
+twr_client_info ClientEngine::info() const {
+  const Lock lock(mutex_);
+  twr_client_info info{};
+  info.size = sizeof(info);
+  info.state = state_;
+  info.last_error = lastError_;
+  socketPath_.copy(info.socket_path, sizeof(info.socket_path) - 1);
+  info.connections = connections_;
+  info.messages_sent = outbox_.messagesSent();
+  info.messages_dropped = outbox_.messagesDropped();
+  info.queued_bytes = outbox_.queuedBytes();
+  return info;
+}
+
+// ---- for the registry ----
+
+void ClientEngine::becomeForked() {
+  hasForked_ = true;
+  isCalling = false;  // a callback may be where the process forked
+  state_ = TWR_STATE_ENDED;
+  socket_.close();
+  event_.close();
+  thread_.forget();
+}
+
+bool ClientEngine::hasThread() const {
+  const Lock lock(mutex_);
+  return thread_.isRunning() && !thread_.isThisThread();
+}
+
+void ClientEngine::abandon() {
+  {
+    const Lock lock(mutex_);
+    isAbandoned_ = true;
+  }
+  end(milliseconds::zero());
+  const Lock lock(mutex_);
+  event_.close();
+}
+
+// ---- the thread ----
+
+void ClientEngine::runThread(void* self) { static_cast<ClientEngine*>(self)->run(); }
+
+void ClientEngine::run() {
+  Lock lock(mutex_);
+  nextAttempt_ = Clock::now();
+  while (!isDone()) {
+    try {
+      work(lock);
+    } catch (const std::bad_alloc&) {
+      connectionLost(ENOMEM);
+    }
+    if (deliver(lock)) {
+      if (hasForked_) return;  // a callback forked, and this is the child
+      continue;
+    }
+    if (!isDone()) sleep(lock);
+  }
+  finish(lock);
+}
+
+void ClientEngine::work(Lock& lock) {
+  if (state_ == TWR_STATE_ENDED) return;
+  if (!socket_.isOpen() && Clock::now() >= nextAttempt_) attempt(lock);
+  if (!socket_.isOpen()) return;
+  if (isReadable_) receive(lock);
+  if (socket_.isOpen() && !hasEndedSending_) transmit(lock);
+}
+
+bool ClientEngine::isDone() const {
+  if (!isEnding_) return false;
+  if (isAbandoned_ || isHopeless_ || state_ == TWR_STATE_ENDED || Clock::now() >= endBy_) return true;
+  return !socket_.isOpen() && outbox_.isEmpty();
+}
+
+void ClientEngine::finish(Lock& lock) {
+  socket_.close();
+  if (isAbandoned_) {
+    setState(TWR_STATE_ENDED);
+    deliveries_.clear();
+    return;
+  }
+  outbox_.end();
+  state_ = TWR_STATE_ENDED;
+  for (const std::shared_ptr<Waiter>& waiter : std::exchange(connectWaiters_, {}))
+    waiter->finish(TWR_NOT_CONNECTED);
+  while (deliver(lock)) {
+    if (hasForked_) return;
+  }
+}
+
+void ClientEngine::attempt(Lock& lock) {
+  setState(TWR_STATE_CONNECTING);
+  int error = ENOENT;
+  for (const std::string& path : settings_.socketPaths) {
+    error = connectTo(lock, path);
+    if (error == 0) return connected(path);
+  }
+  attemptFailed(error);
+}
+
+// The descriptor is the member all the while, so that a child process closes its copy.
+int ClientEngine::connectTo(Lock& lock, const std::string& path) {
+  int error = socket_.open();
+  if (error != 0) return error;
+  lock.unlock();
+  error = socket_.connect(path);
+  lock.lock();
+  if (error != 0) socket_.close();
+  return error;
+}
+
+void ClientEngine::connected(const std::string& path) {
+  reader_.emplace(texts_);
+  socketPath_ = path;
+  ++connections_;
+  connectedAt_ = Clock::now();
+  isReadable_ = false;
+  awaitsRoom_ = false;
+  hasEndedSending_ = false;
+  hasAnswered_ = false;
+  outbox_.connected();
+  setState(TWR_STATE_CONNECTED);
+  for (const std::shared_ptr<Waiter>& waiter : std::exchange(connectWaiters_, {})) waiter->finish(TWR_OK);
+}
+
+void ClientEngine::attemptFailed(int error) {
+  isHopeless_ = isEnding_;
+  waitBeforeNextAttempt(error);
+  for (const std::shared_ptr<Waiter>& waiter : std::exchange(connectWaiters_, {}))
+    waiter->finish(TWR_NOT_CONNECTED);
+  outbox_.failBarriers(TWR_NOT_CONNECTED);
+}
+
+void ClientEngine::connectionLost(int error) {
+  socket_.close();
+  isReadable_ = false;
+  awaitsRoom_ = false;
+  outbox_.disconnected();
+  if (hasAnswered_ || Clock::now() - connectedAt_ >= settings_.settledTime) backoff_.reset();
+  waitBeforeNextAttempt(error);
+}
+
+void ClientEngine::waitBeforeNextAttempt(int error) {
+  lastError_ = error;
+  if (settings_.isOnce) {
+    outbox_.end();
+    setState(TWR_STATE_ENDED);
+    return;
+  }
+  nextAttempt_ = Clock::now() + backoff_.next();
+  setState(TWR_STATE_WAITING);
+}
+
+void ClientEngine::transmit(Lock& lock) {
+  for (int at = 0; at < kMostTransfers; ++at) {
+    const std::string_view bytes = outbox_.unsent();
+    if (bytes.empty()) {
+      outbox_.sent(0);
+      if (!isEnding_ || !outbox_.isEmpty()) return;
+      hasEndedSending_ = true;
+      socket_.endSending();
+      return;
+    }
+    lock.unlock();
+    const ClientSocket::Transfer transfer = socket_.send(bytes);
+    lock.lock();
+    awaitsRoom_ = transfer.error == EAGAIN;
+    if (awaitsRoom_) return;
+    if (transfer.error != 0) return connectionLost(transfer.error);
+    outbox_.sent(transfer.bytes);
+  }
+  isWoken_ = true;  // there may be more
+}
+
+void ClientEngine::receive(Lock& lock) {
+  std::array<char, kReadBytes> bytes;
+  for (int at = 0; at < kMostTransfers; ++at) {
+    lock.unlock();
+    const ClientSocket::Transfer transfer = socket_.receive(bytes.data(), bytes.size());
+    lock.lock();
+    if (transfer.error == EAGAIN) return;
+    if (transfer.error != 0) return connectionLost(transfer.error);
+    if (transfer.isEnd) return connectionLost(ECONNRESET);
+    if (!decode({bytes.data(), transfer.bytes})) return connectionLost(EBADMSG);
+  }
+}
+
+bool ClientEngine::decode(std::string_view bytes) {
+  for (;;) {
+    const RpcFrameReader::Result result = reader_->next(bytes);
+    if (result != RpcFrameReader::Result::kFrame) return result == RpcFrameReader::Result::kNeedsMore;
+    const RpcFrame& frame = reader_->frame();
+    if (frame.kind != RpcFrame::Kind::kResponse || frame.refused) return false;
+    hasAnswered_ = true;
+    outbox_.answered(frame);
+  }
+}
+
+bool ClientEngine::deliver(Lock& lock) {
+  if (deliveries_.empty()) return false;
+  const Deliveries deliveries = std::exchange(deliveries_, {});
+  lock.unlock();
+  isCalling = true;
+  for (const Delivery& delivery : deliveries) {
+    if (delivery.state) {
+      settings_.stateChanged(settings_.context, *delivery.state);
+    } else {
+      delivery.reply.function(delivery.reply.context, &delivery.answer->as(delivery.reply.kind));
+    }
+    if (hasForked_) break;
+  }
+  isCalling = false;
+  if (!hasForked_) lock.lock();
+  return true;
+}
+
+void ClientEngine::sleep(Lock& lock) {
+  if (std::exchange(isWoken_, false)) return;
+  const short events = awaitsRoom_ ? POLLIN | POLLOUT : POLLIN;
+  std::array<pollfd, 2> polled{{{event_.fileDescriptor(), POLLIN, 0}, {socket_.fileDescriptor(), events, 0}}};
+  const int timeout = pollTimeout();
+  isSleeping_ = true;
+  lock.unlock();
+  const int count = ::poll(polled.data(), polled.size(), timeout);
+  lock.lock();
+  isSleeping_ = false;
+  isWoken_ = false;
+  if (count <= 0) return;
+  if (polled[0].revents != 0) event_.clear();
+  isReadable_ = (polled[1].revents & ~POLLOUT) != 0;
+  if ((polled[1].revents & POLLOUT) != 0) awaitsRoom_ = false;
+}
+
+// In milliseconds, rounded up; -1 for as long as it takes.
+int ClientEngine::pollTimeout() {
+  std::optional<Clock::time_point> until;
+  const auto notAfter = [&](Clock::time_point time) { until = until ? std::min(*until, time) : time; };
+  if (isEnding_) notAfter(endBy_);
+  if (state_ == TWR_STATE_WAITING) notAfter(nextAttempt_);
+  if (state_ == TWR_STATE_CONNECTED && outbox_.hasSenders() && !awaitsRoom_) {
+    const bool isBusy = std::exchange(seenRingMessages_, outbox_.ringMessages()) != outbox_.ringMessages();
+    ringPoll_ = isBusy ? settings_.busyPoll : std::min(2 * ringPoll_, settings_.idlePoll);
+    notAfter(Clock::now() + ringPoll_);
+  }
+  if (!until) return -1;
+  const auto left = std::chrono::ceil<milliseconds>(*until - Clock::now()).count();
+  return static_cast<int>(std::clamp<std::int64_t>(left, 0, std::numeric_limits<int>::max()));
+}
+
+void ClientEngine::setState(twr_state state) {
+  if (state_ == state) return;
+  state_ = state;
+  if (settings_.stateChanged != nullptr) deliveries_.push_back({{}, nullptr, state});
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,510 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "client/ClientOutbox.h"
+
+#include <algorithm>
+#include <utility>
+
+#include "client/MessageFrame.h"
+#include "client/RequestBody.h"
+#include "platform/linux/RpcLimits.h"
+
+namespace tonewerk {
+namespace {
+
+using Kind = SessionChange::Kind;
+
+constexpr std::size_t kNotificationHeadBytes = 2;
+constexpr std::size_t kLeastReplies = 64;
+
+std::string messageBody(const RingMessage& message, std::span<const std::int64_t> reporterIDs) {
+  std::string frame;
+  appendMessageFrame(frame, std::nullopt, message, reporterIDs);
+  frame.erase(0, kNotificationHeadBytes);
+  return frame;
+}
+
+bool fitsFrame(const ValueMap& configuration) {
+  std::string body;
+  appendChange(body, {Kind::kConfiguration, TWR_SERVICE_UNKNOWN, configuration}, 0);
+  return body.size() + kFrameHeadBytes + kReporterIDBytes <= kMostFrameBytes;
+}
+
+}  // namespace
+
+ClientOutbox::ClientOutbox(std::size_t queueBytes, Deliveries& deliveries)
+    : deliveries_(deliveries),
+      mostReplies_(std::max(kLeastReplies, queueBytes / kBytesPerReply)),
+      queue_(queueBytes) {}
+
+// ---- callers ----
+
+std::shared_ptr<twr_session> ClientOutbox::addSession(ClientEngine& engine, std::int64_t reporterID) {
+  if (liveSessions_ >= kMostSessions) return nullptr;
+  auto session = std::make_shared<twr_session>(engine, reporterID);
+  sessions_.push_back(session);
+  ++liveSessions_;
+  if (!hasEnded_) change(*session, {}, {});
+  return session;
+}
+
+twr_status ClientOutbox::change(twr_session& session, SessionChange change, PendingReply reply) {
+  if (hasEnded_) return TWR_NOT_CONNECTED;
+  SessionState wanted = session.wanted;
+  wanted.apply(change);
+  if (change.kind == Kind::kConfiguration && !fitsFrame(wanted.configuration)) return TWR_TOO_LARGE;
+
+  const bool isStart = change.kind == Kind::kStart;
+  Command command;
+  command.kind = Command::Kind::kChange;
+  command.session = session.shared_from_this();
+  command.bytes = Command::kOverheadBytes + change.configuration.bytes();
+  command.change = std::make_unique<SessionChange>(std::move(change));
+  session.wanted = std::move(wanted);
+
+  const bool hasRoom = queue_.hasRoomForChange(command.bytes);
+  const bool takesReply = reply && hasRoom && acceptReply(isStart);
+  reply.isStart = isStart;
+  if (takesReply) command.reply = reply;
+  if (hasRoom) {
+    add(std::move(command));
+  } else {
+    reconcileLater(session);
+  }
+  return reply && !takesReply ? TWR_FULL : TWR_OK;
+}
+
+twr_status ClientOutbox::destroy(twr_session& session, PendingReply reply) {
+  const std::shared_ptr<twr_session> kept = session.shared_from_this();
+  session.isDestroyed = true;
+  --liveSessions_;
+  for (const std::shared_ptr<twr_sender>& sender : session.senders) sender->isClosed = true;
+  const twr_status status = change(session, {Kind::kDestroy, TWR_SERVICE_UNKNOWN, {}}, reply);
+  absorbClosedRings();
+  forgetIfGone(session);
+  return status;
+}
+
+twr_status ClientOutbox::send(twr_session* session, RingMessage message,
+                              std::span<const std::int64_t> reporterIDs, PendingReply reply) {
+  if (hasEnded_) return TWR_NOT_CONNECTED;
+  Command command;
+  command.bytes = Command::kOverheadBytes + message.bytes.size() + kMessageFrameBytes +
+                  reporterIDs.size() * kReporterIDBytes;
+  if (!queue_.hasRoomForMessage(command.bytes) || (reply && !acceptReply(false))) {
+    ++dropped_;
+    if (session != nullptr) ++session->dropped;
+    return TWR_FULL;
+  }
+  if (session != nullptr) {
+    command.session = session->shared_from_this();
+    message.dropped = std::exchange(session->dropped, 0);
+  }
+  command.dropped = message.dropped;
+  command.body = messageBody(message, reporterIDs);
+  command.reply = reply;
+  add(std::move(command));
+  return TWR_OK;
+}
+
+twr_status ClientOutbox::request(std::string body, PendingReply reply) {
+  if (hasEnded_) return TWR_NOT_CONNECTED;
+  Command command;
+  command.kind = Command::Kind::kRequest;
+  command.bytes = Command::kOverheadBytes + body.size();
+  if (!queue_.hasRoomForChange(command.bytes) || (reply && !acceptReply(false))) return TWR_FULL;
+  command.body = std::move(body);
+  command.reply = reply;
+  add(std::move(command));
+  return TWR_OK;
+}
+
+void ClientOutbox::addBarrier(std::shared_ptr<Waiter> waiter) {
+  Command command;
+  command.kind = Command::Kind::kBarrier;
+  command.waiter = std::move(waiter);
+  for (const std::shared_ptr<twr_sender>& sender : senders_)
+    command.marks.push_back({sender, sender->ring.writtenPosition()});
+  queue_.add(std::move(command));
+}
+
+bool ClientOutbox::acceptReply(bool isStart) {
+  std::size_t& count = isStart ? startReplyCount_ : replyCount_;
+  if (count >= (isStart ? kMostStartReplies : mostReplies_)) return false;
+  ++count;
+  return true;
+}
+
+Command& ClientOutbox::add(Command command) {
+  if (command.session != nullptr) {
+    command.session->lastReconciliation = nullptr;
+    for (const std::shared_ptr<twr_sender>& sender : command.session->senders)
+      command.marks.push_back({sender, sender->ring.writtenPosition()});
+  }
+  return queue_.add(std::move(command));
+}
+
+void ClientOutbox::reconcileLater(twr_session& session) {
+  if (session.lastReconciliation == nullptr) {
+    Command command;
+    command.kind = Command::Kind::kReconcile;
+    command.session = session.shared_from_this();
+    command.wanted = std::make_unique<SessionState>();
+    session.lastReconciliation = &add(std::move(command));
+  }
+  *session.lastReconciliation->wanted = session.wanted;
+  // A session that came and went without the daemon's having heard of it: nothing is left to be told.
+  const bool neverWas = !session.sent.exists && !session.wanted.exists && session.queued == 1;
+  if (!neverWas || session.unsent > 0 || !session.senders.empty()) return;
+  queue_.remove(*session.lastReconciliation);
+}
+
+void ClientOutbox::forgetIfGone(twr_session& session) {
+  const bool isGone = session.isDestroyed && session.queued == 0 && session.unsent == 0 &&
+                      session.senders.empty() && (hasEnded_ || !session.sent.exists);
+  if (isGone) std::erase_if(sessions_, [&](const auto& held) { return held.get() == &session; });
+}
+
+// ---- the thread ----
+
+void ClientOutbox::connected() {
+  isConnected_ = true;
+  toRecreate_.clear();
+  for (const std::shared_ptr<twr_session>& session : sessions_)
+    if (session->sent.exists) toRecreate_.push_back(session);
+}
+
+std::string_view ClientOutbox::unsent() {
+  fill();
+  return batch_.unsent();
+}
+
+void ClientOutbox::fill() {
+  while (!batch_.isFull() && !toRecreate_.empty()) {
+    recreate(*toRecreate_.front());
+    toRecreate_.pop_front();
+  }
+  if (!toRecreate_.empty()) return;
+  drainQuietRings();
+  while (!batch_.isFull() && !queue_.empty() && drainMarks(queue_.front())) encodeNext();
+  // Only now nothing that was asked for before can be behind what is in the rings.
+  if (queue_.empty()) drainQuietRings();
+}
+
+// As the daemon had it when the connection broke.
+void ClientOutbox::recreate(twr_session& session) {
+  for (const SessionChange& change : changesBetween({}, session.sent)) {
+    OutgoingFrame frame;
+    frame.origin = OutgoingFrame::Origin::kRecreation;
+    const bool isAwaited = session.starts != nullptr && !session.starts->waiting.empty();
+    if (change.kind == Kind::kStart && isAwaited) frame.identifier = replies_.add({{}, session.starts, true});
+    appendFrameHead(batch_.bytes(), frame.optionalIdentifier());
+    appendChange(batch_.bytes(), change, session.identifier);
+    batch_.add(std::move(frame));
+  }
+}
+
+void ClientOutbox::encodeNext() {
+  Command command = queue_.take();
+  switch (command.kind) {
+    case Command::Kind::kChange:
+      return encodeChange(std::move(command));
+    case Command::Kind::kReconcile:
+      return expand(std::move(command));
+    case Command::Kind::kMessage:
+    case Command::Kind::kRequest:
+    case Command::Kind::kBarrier:
+      break;
+  }
+  OutgoingFrame frame;
+  if (command.reply) frame.identifier = replies_.add({command.reply, nullptr, false});
+  if (command.kind != Command::Kind::kBarrier) appendFrameHead(batch_.bytes(), frame.optionalIdentifier());
+  batch_.bytes() += command.body;
+  frame.command = std::move(command);
+  batch_.add(std::move(frame));
+}
+
+void ClientOutbox::encodeChange(Command command) {
+  twr_session& session = *command.session;
+  OutgoingFrame frame;
+  frame.stateBefore = std::make_unique<SessionState>(session.sent);
+  frame.startsBefore = session.starts;
+  frame.startCountBefore = session.starts == nullptr ? 0 : session.starts->waiting.size();
+
+  const SessionChange& change = *command.change;
+  const bool wasStarted = session.sent.isStarted;
+  session.sent.apply(change);
+  ReplyTable::Entry entry;
+  if (change.kind == Kind::kStart) {
+    if (command.reply) {
+      if (session.starts == nullptr) session.starts = std::make_shared<StartReplies>();
+      session.starts->waiting.push_back(command.reply);
+    }
+    // A start of what is started is never answered: its caller joins the one that waits already.
+    if (!wasStarted) entry = {{}, session.starts, true};
+  } else {
+    entry.reply = command.reply;
+    // The daemon does not answer the start of a session that is destroyed or made anew, nor of one that was
+    // started without a reply; the answer to what ended the run stands for it.
+    if (wasStarted && !session.sent.isStarted) entry.starts = std::exchange(session.starts, nullptr);
+  }
+  if (entry.reply || (entry.starts != nullptr && !entry.starts->waiting.empty()))
+    frame.identifier = replies_.add(std::move(entry));
+
+  appendFrameHead(batch_.bytes(), frame.optionalIdentifier());
+  appendChange(batch_.bytes(), change, session.identifier);
+  frame.command = std::move(command);
+  batch_.add(std::move(frame));
+}
+
+// What is still to be done for it takes its place.
+void ClientOutbox::expand(Command reconciliation) {
+  std::vector<SessionChange> changes = changesBetween(reconciliation.session->sent, *reconciliation.wanted);
+  for (auto change = changes.rbegin(); change != changes.rend(); ++change) {
+    Command command;
+    command.kind = Command::Kind::kChange;
+    command.session = reconciliation.session;
+    command.change = std::make_unique<SessionChange>(std::move(*change));
+    queue_.insert(queue_.begin(), std::move(command));
+  }
+  queue_.released(reconciliation.bytes);
+  forgetIfGone(*reconciliation.session);
+}
+
+void ClientOutbox::sent(std::size_t bytes) {
+  for (OutgoingFrame& frame : batch_.sent(bytes)) {
+    Command& command = frame.command;
+    queue_.released(command.bytes);
+    const bool isMessage =
+        frame.origin == OutgoingFrame::Origin::kRing ||
+        (frame.origin == OutgoingFrame::Origin::kQueue && command.kind == Command::Kind::kMessage);
+    if (isMessage) ++messagesSent_;
+    if (command.waiter != nullptr) command.waiter->finish(TWR_OK);
+    if (command.session != nullptr) forgetIfGone(*command.session);
+  }
+}
+
+void ClientOutbox::answered(const RpcFrame& response) {
+  std::optional<ReplyTable::Entry> entry = replies_.take(response.identifier);
+  if (!entry) return;
+  const auto answer = std::make_shared<DecodedAnswer>(response);
+  if (entry->starts != nullptr)
+    deliver(*entry->starts, entry->isStart ? answer : std::make_shared<DecodedAnswer>(TWR_OK));
+  deliver(entry->reply, answer);
+}
+
+void ClientOutbox::disconnected() {
+  isConnected_ = false;
+  toRecreate_.clear();
+  std::vector<OutgoingFrame> frames = batch_.takeBack();
+  for (auto frame = frames.rbegin(); frame != frames.rend(); ++frame) takeBack(std::move(*frame));
+  const auto lost = std::make_shared<DecodedAnswer>(TWR_NOT_CONNECTED);
+  for (const ReplyTable::Entry& entry : replies_.takeAll()) {
+    deliver(entry.reply, lost);
+    // A start's stay: the session is started again. Only what should have ended a run leaves it in doubt.
+    if (!entry.isStart && entry.starts != nullptr) deliver(*entry.starts, lost);
+  }
+  absorbClosedRings();
+}
+
+void ClientOutbox::takeBack(OutgoingFrame frame) {
+  if (frame.origin == OutgoingFrame::Origin::kRecreation) return;
+  if (frame.identifier != 0) replies_.take(frame.identifier);
+  if (frame.stateBefore != nullptr) {
+    twr_session& session = *frame.command.session;
+    session.sent = std::move(*frame.stateBefore);
+    session.starts = frame.startsBefore;
+    const std::size_t waiting = session.starts == nullptr ? 0 : session.starts->waiting.size();
+    if (waiting > frame.startCountBefore) {
+      session.starts->waiting.resize(frame.startCountBefore);
+    } else if (frame.startsBefore != nullptr && frame.command.reply.isStart) {
+      frame.command.reply = {};  // told already, with those that it had joined
+    }
+  }
+  if (frame.origin == OutgoingFrame::Origin::kRing) {
+    frame.command.bytes = Command::kOverheadBytes + frame.command.body.size();
+    queue_.insert(queue_.begin(), std::move(frame.command));
+  } else {
+    queue_.putBack(std::move(frame.command));
+  }
+}
+
+void ClientOutbox::failBarriers(twr_status status) {
+  for (auto at = queue_.begin(); at != queue_.end();) {
+    Command& command = *at++;
+    if (command.waiter == nullptr) continue;
+    command.waiter->finish(status);
+    queue_.remove(command);
+  }
+}
+
+void ClientOutbox::end() {
+  disconnected();
+  hasEnded_ = true;
+  const auto lost = std::make_shared<DecodedAnswer>(TWR_NOT_CONNECTED);
+  for (Command& command : queue_.takeAll()) {
+    if (command.kind == Command::Kind::kMessage) ++dropped_;
+    if (command.waiter != nullptr) command.waiter->finish(TWR_NOT_CONNECTED);
+    deliver(command.reply, lost);
+  }
+  for (const std::shared_ptr<twr_session>& session : sessions_) {
+    const std::shared_ptr<StartReplies> starts = std::exchange(session->starts, nullptr);
+    if (starts != nullptr) deliver(*starts, lost);
+  }
+  absorbClosedRings();  // into nothing
+  std::erase_if(sessions_, [](const auto& session) { return session->isDestroyed; });
+}
+
+// ---- senders ----
+
+std::shared_ptr<twr_sender> ClientOutbox::openSender(twr_session& session, const std::atomic<bool>& hasForked,
+                                                     std::size_t ringBytes) {
+  if (senders_.size() >= kMostSenders) return nullptr;
+  auto sender = std::make_shared<twr_sender>(session.shared_from_this(), hasForked, ringBytes);
+  senders_.push_back(sender);
+  session.senders.push_back(sender);
+  return sender;
+}
+
+void ClientOutbox::closeSender(twr_sender& sender) {
+  sender.isClosed = true;
+  absorbClosedRings();
+}
+
+bool ClientOutbox::hasRingData() const {
+  return std::any_of(senders_.begin(), senders_.end(), [](const std::shared_ptr<twr_sender>& sender) {
+    return sender->isClosed || sender->ring.readPosition() != sender->ring.writtenPosition();
+  });
+}
+
+// Those of sessions with nothing in the queue that would have to go out first.
+void ClientOutbox::drainQuietRings() {
+  // A closed one goes out of the list when it is empty.
+  for (std::size_t at = 0; at < senders_.size() && !batch_.isFull();) {
+    const std::shared_ptr<twr_sender> sender = senders_[at];
+    const std::shared_ptr<twr_session> session = sender->session.lock();
+    if (session->queued == 0) drain(*sender, sender->ring.writtenPosition());
+    if (at < senders_.size() && senders_[at] == sender) ++at;
+  }
+}
+
+// What had been written to rings when `command` was asked for. False when the batch is full first.
+bool ClientOutbox::drainMarks(Command& command) {
+  while (!command.marks.empty()) {
+    const RingMark& mark = command.marks.back();
+    if (!drain(*mark.sender, mark.position)) return false;
+    command.marks.pop_back();
+  }
+  return true;
+}
+
+bool ClientOutbox::drain(twr_sender& sender, std::uint64_t position) {
+  const std::shared_ptr<twr_session> session = sender.session.lock();
+  while (sender.ring.readPosition() < position) {
+    if (batch_.isFull()) return false;
+    const std::optional<RingMessage> message = sender.ring.front();
+    if (!message) break;
+    appendFromRing(*session, *message);
+    sender.ring.pop();
+  }
+  if (!sender.isClosed || sender.ring.readPosition() != sender.ring.writtenPosition()) return true;
+  if (const std::optional<RingMessage> loss = sender.ring.unreportedLoss()) appendFromRing(*session, *loss);
+  removeSender(sender);
+  return true;
+}
+
+void ClientOutbox::appendFromRing(twr_session& session, RingMessage message) {
+  message.dropped += std::exchange(session.dropped, 0);
+  appendMessageFrame(batch_.bytes(), std::nullopt, message, {&session.identifier, 1});
+  OutgoingFrame frame;
+  frame.origin = OutgoingFrame::Origin::kRing;
+  frame.command.session = session.shared_from_this();
+  frame.command.dropped = message.dropped;
+  batch_.add(std::move(frame));
+  ++ringMessages_;
+}
+
+// Nobody takes what is in them, or too slowly: it goes to the queue, within its bound.
+void ClientOutbox::absorbClosedRings() {
+  std::size_t bytes = 0;
+  std::vector<std::shared_ptr<twr_sender>> closed;
+  for (const std::shared_ptr<twr_sender>& sender : senders_) {
+    if (!sender->isClosed) continue;
+    closed.push_back(sender);
+    bytes += sender->ring.capacity();
+  }
+  if (isConnected_ && bytes <= kMostClosedRingBytes) return;
+  for (const std::shared_ptr<twr_sender>& sender : closed) absorb(*sender);
+}
+
+// What had been written when something in the queue was asked for goes before it.
+void ClientOutbox::absorb(twr_sender& sender) {
+  const std::shared_ptr<twr_session> session = sender.session.lock();
+  const std::uint64_t end = sender.ring.writtenPosition();
+  auto lossPlace = queue_.end();
+  for (auto place = queue_.begin(); place != queue_.end(); ++place) {
+    const auto mark = std::find_if(place->marks.begin(), place->marks.end(),
+                                   [&](const RingMark& held) { return held.sender.get() == &sender; });
+    if (mark == place->marks.end()) continue;
+    absorbUpTo(sender, mark->position, place);
+    if (mark->position == end && lossPlace == queue_.end()) lossPlace = place;
+    place->marks.erase(mark);
+  }
+  absorbUpTo(sender, end, queue_.end());
+  if (const std::optional<RingMessage> loss = sender.ring.unreportedLoss())
+    absorbMessage(*session, *loss, lossPlace);
+  removeSender(sender);
+}
+
+void ClientOutbox::absorbUpTo(twr_sender& sender, std::uint64_t position, CommandQueue::Iterator place) {
+  const std::shared_ptr<twr_session> session = sender.session.lock();
+  while (sender.ring.readPosition() < position) {
+    const std::optional<RingMessage> message = sender.ring.front();
+    if (!message) return;
+    absorbMessage(*session, *message, place);
+    sender.ring.pop();
+  }
+}
+
+void ClientOutbox::absorbMessage(twr_session& session, RingMessage message, CommandQueue::Iterator place) {
+  Command command;
+  command.bytes = Command::kOverheadBytes + message.bytes.size() + kMessageFrameBytes;
+  if (hasEnded_ || !queue_.hasRoomForMessage(command.bytes)) {
+    const std::uint64_t itself = message.entries == 0 && message.type == TWR_TYPE_UNKNOWN ? 0 : 1;
+    dropped_ += itself;
+    session.dropped += message.dropped + itself;
+    return;
+  }
+  message.dropped += std::exchange(session.dropped, 0);
+  command.dropped = message.dropped;
+  command.body = messageBody(message, {&session.identifier, 1});
+  command.session = session.shared_from_this();
+  session.lastReconciliation = nullptr;
+  queue_.insert(place, std::move(command));
+}
+
+void ClientOutbox::removeSender(twr_sender& sender) {
+  dropped_ += sender.ring.dropped();
+  const auto isIt = [&](const std::shared_ptr<twr_sender>& held) { return held.get() == &sender; };
+  const std::shared_ptr<twr_session> session = sender.session.lock();
+  std::erase_if(session->senders, isIt);
+  std::erase_if(senders_, isIt);
+  forgetIfGone(*session);
+}
+
+std::uint64_t ClientOutbox::messagesDropped() const {
+  std::uint64_t dropped = dropped_;
+  for (const std::shared_ptr<twr_sender>& sender : senders_) dropped += sender->ring.dropped();
+  return dropped;
+}
+
+void ClientOutbox::deliver(const PendingReply& reply, const std::shared_ptr<DecodedAnswer>& answer) {
+  if (!reply) return;
+  --(reply.isStart ? startReplyCount_ : replyCount_);
+  deliveries_.push_back({reply, answer, std::nullopt});
+}
+
+void ClientOutbox::deliver(StartReplies& starts, const std::shared_ptr<DecodedAnswer>& answer) {
+  for (const PendingReply& reply : std::exchange(starts.waiting, {})) deliver(reply, answer);
+}
+
+}  // namespace tonewerk

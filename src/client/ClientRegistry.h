@@ -1,0 +1,16 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+namespace tonewerk {
+
+class ClientEngine;
+
+// The process's clients: for fork(), whose child has copies of them, and for the library's end.
+namespace clientRegistry {
+
+// False without memory for what fork() is to call.
+bool add(ClientEngine& engine);
+void remove(ClientEngine& engine);
+
+}  // namespace clientRegistry
+}  // namespace tonewerk

@@ -1,0 +1,63 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <condition_variable>
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "client/PendingReply.h"
+#include "client/SessionState.h"
+#include "tonewerk/reporting.h"
+
+namespace tonewerk {
+
+// A caller that waits, under the engine's mutex. It is shared, because a caller that forks away leaves one
+// behind that must never be destroyed: it still has a waiter.
+struct Waiter {
+  std::condition_variable condition;
+  bool isDone = false;
+  twr_status status = TWR_OK;
+
+  void finish(twr_status result) {
+    isDone = true;
+    status = result;
+    condition.notify_all();
+  }
+};
+
+// How far a ring had been written when something was asked for: so far it goes out before.
+struct RingMark {
+  std::shared_ptr<twr_sender> sender;
+  std::uint64_t position = 0;
+};
+
+// Something that waits to be sent.
+struct Command {
+  enum class Kind {
+    kMessage,    // `body`
+    kRequest,    // `body`
+    kChange,     // `change` of `session`
+    kReconcile,  // whatever leads `session` to `wanted`
+    kBarrier,    // nothing; tells `waiter` that all before it has gone out
+  };
+
+  // What a command takes in memory next to its bytes, roughly.
+  static constexpr std::size_t kOverheadBytes = 128;
+
+  Kind kind = Kind::kMessage;
+  std::shared_ptr<twr_session> session;  // null for the client's own
+  std::string body;
+  std::uint64_t dropped = 0;  // what a message says; it is said again should this one be dropped
+  PendingReply reply;
+  std::vector<RingMark> marks;
+  std::unique_ptr<SessionChange> change;
+  std::unique_ptr<SessionState> wanted;
+  std::shared_ptr<Waiter> waiter;
+  std::size_t bytes = 0;  // what it counts for in the queue's bound
+};
+
+}  // namespace tonewerk

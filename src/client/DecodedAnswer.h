@@ -1,0 +1,35 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstdint>
+#include <string>
+#include <vector>
+
+#include "client/PendingReply.h"
+#include "platform/linux/RpcFrame.h"
+#include "tonewerk/reporting.h"
+
+namespace tonewerk {
+
+// An answer as callers of the C interface see it, with the memory that it points into.
+class DecodedAnswer {
+ public:
+  explicit DecodedAnswer(twr_status status);
+  // Of a response. A result of another kind than expected leaves the members for it as they are without one.
+  explicit DecodedAnswer(const RpcFrame& response);
+
+  // Valid until the next call, and as long as this object.
+  const twr_answer& as(AnswerKind kind);
+
+ private:
+  void take(const Value& error);
+
+  twr_answer answer_{};
+  std::string errorDomain_;
+  std::string errorMessage_;
+  std::optional<Value> value_;
+  std::string result_;
+  std::vector<std::int64_t> reporterIDs_;
+};
+
+}  // namespace tonewerk

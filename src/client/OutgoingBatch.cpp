@@ -1,0 +1,65 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "client/OutgoingBatch.h"
+
+#include <utility>
+
+#include "client/SessionRecord.h"
+
+namespace tonewerk {
+namespace {
+
+void countUnsent(const OutgoingFrame& frame, bool isMore) {
+  if (frame.command.session == nullptr) return;
+  std::size_t& unsent = frame.command.session->unsent;
+  isMore ? ++unsent : --unsent;
+}
+
+// Of a notification: an array of three and its kind.
+constexpr std::size_t kNotificationHeadBytes = 2;
+
+}  // namespace
+
+void OutgoingBatch::add(OutgoingFrame frame) {
+  countUnsent(frame, true);
+  frames_.push_back({std::move(frame), bytes_.size()});
+}
+
+std::vector<OutgoingFrame> OutgoingBatch::sent(std::size_t count) {
+  sent_ += count;
+  std::vector<OutgoingFrame> gone;
+  while (!frames_.empty() && frames_.front().end <= sent_) {
+    sentFrames_ = frames_.front().end;
+    countUnsent(frames_.front().frame, false);
+    gone.push_back(std::move(frames_.front().frame));
+    frames_.pop_front();
+  }
+  if (frames_.empty()) clear();
+  return gone;
+}
+
+std::vector<OutgoingFrame> OutgoingBatch::takeBack() {
+  std::vector<OutgoingFrame> back;
+  std::size_t begin = sentFrames_;
+  for (Entry& entry : frames_) {
+    if (entry.frame.origin == OutgoingFrame::Origin::kRing) {
+      const std::size_t body = begin + kNotificationHeadBytes;
+      entry.frame.command.body = bytes_.substr(body, entry.end - body);
+    }
+    begin = entry.end;
+    countUnsent(entry.frame, false);
+    back.push_back(std::move(entry.frame));
+  }
+  frames_.clear();
+  clear();
+  return back;
+}
+
+void OutgoingBatch::clear() {
+  // One large frame's memory is not kept for ever.
+  if (bytes_.capacity() > 2 * kFullBytes) bytes_ = std::string();
+  bytes_.clear();
+  sent_ = 0;
+  sentFrames_ = 0;
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,40 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+#include <optional>
+#include <unordered_map>
+#include <vector>
+
+#include "client/PendingReply.h"
+
+namespace tonewerk {
+
+// Who waits for what on one connection, by the requests' identifiers.
+class ReplyTable {
+ public:
+  struct Entry {
+    PendingReply reply;
+    // Of a start, whose answer is theirs; and of what ends a run, with whose answer at the latest they are
+    // told.
+    std::shared_ptr<StartReplies> starts;
+    bool isStart = false;
+  };
+
+  // The identifier that the request is to be sent with.
+  std::uint32_t add(Entry entry);
+  // None when nobody waits: an answer to nothing, or the second of two.
+  std::optional<Entry> take(std::uint32_t identifier);
+  // In the order of the requests. A new connection begins anew.
+  std::vector<Entry> takeAll();
+
+  std::size_t size() const { return entries_.size(); }
+
+ private:
+  std::unordered_map<std::uint32_t, Entry> entries_;
+  std::uint32_t next_ = 1;
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,72 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "client/SessionState.h"
+
+#include "client/RequestBody.h"
+
+namespace tonewerk {
+
+using Kind = SessionChange::Kind;
+
+void SessionState::apply(const SessionChange& change) {
+  switch (change.kind) {
+    case Kind::kCreate:
+      *this = SessionState();
+      exists = true;
+      return;
+    case Kind::kServiceType:
+      isStarted = isStarted && serviceType == change.serviceType;
+      serviceType = change.serviceType;
+      return;
+    case Kind::kConfiguration:
+      configuration.merge(change.configuration);
+      return;
+    case Kind::kStart:
+      isStarted = true;
+      return;
+    case Kind::kStop:
+      isStarted = false;
+      return;
+    case Kind::kDestroy:
+      *this = SessionState();
+      return;
+  }
+}
+
+std::vector<SessionChange> changesBetween(const SessionState& from, const SessionState& to) {
+  std::vector<SessionChange> changes;
+  SessionState state = from;
+  const auto add = [&](SessionChange change) {
+    state.apply(change);
+    changes.push_back(std::move(change));
+  };
+  if (!to.exists) {
+    if (from.exists) add({Kind::kDestroy, TWR_SERVICE_UNKNOWN, {}});
+    return changes;
+  }
+  if (!state.exists) add({Kind::kCreate, TWR_SERVICE_UNKNOWN, {}});
+  if (state.serviceType != to.serviceType) add({Kind::kServiceType, to.serviceType, {}});
+  if (state.configuration != to.configuration)
+    add({Kind::kConfiguration, TWR_SERVICE_UNKNOWN, to.configuration});
+  if (state.isStarted != to.isStarted)
+    add({to.isStarted ? Kind::kStart : Kind::kStop, TWR_SERVICE_UNKNOWN, {}});
+  return changes;
+}
+
+void appendChange(std::string& out, const SessionChange& change, std::int64_t reporterID) {
+  switch (change.kind) {
+    case Kind::kCreate:
+      return appendRequestBody(out, "createReportingSession", {Value(reporterID)});
+    case Kind::kServiceType:
+      return appendRequestBody(out, "setServiceType", {Value(change.serviceType), Value(reporterID)});
+    case Kind::kConfiguration:
+      return appendRequestBody(out, "setConfiguration", {Value(change.configuration), Value(reporterID)});
+    case Kind::kStart:
+      return appendRequestBody(out, "startReportingSessionForID", {Value(reporterID)});
+    case Kind::kStop:
+      return appendRequestBody(out, "stopReportingSessionForID", {Value(reporterID)});
+    case Kind::kDestroy:
+      return appendRequestBody(out, "destroyReportingSession", {Value(reporterID)});
+  }
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,328 @@
+// SPDX-License-Identifier: Apache-2.0
+// The C interface to clients, sessions and senders: arguments are checked here, and no exception passes.
+#include "tonewerk/reporting.h"
+
+#include <algorithm>
+#include <cstddef>
+#include <cstring>
+#include <ctime>
+#include <memory>
+#include <new>
+#include <span>
+#include <string>
+#include <string_view>
+#include <sys/random.h>
+#include <utility>
+
+#include "client/ClientHandle.h"
+#include "client/ClientRegistry.h"
+#include "client/MessageFrame.h"
+#include "client/PayloadFlags.h"
+#include "client/RequestBody.h"
+#include "client/SocketPaths.h"
+#include "platform/linux/RpcLimits.h"
+#include "platform/linux/Utf8.h"
+
+namespace tonewerk {
+namespace {
+
+using std::chrono::milliseconds;
+using Kind = SessionChange::Kind;
+
+// Runs what may run out of memory.
+template <class Result, class Function>
+Result guarded(Result otherwise, Function function) noexcept {
+  try {
+    return function();
+  } catch (...) {
+    return otherwise;
+  }
+}
+
+template <class Function>
+twr_status guarded(Function function) noexcept {
+  return guarded(TWR_NO_MEMORY, function);
+}
+
+ClientSettings settingsOf(const twr_client_options* given) {
+  twr_client_options options{};
+  // A caller may know of fewer members than there are.
+  if (given != nullptr) std::memcpy(&options, given, std::min(given->size, sizeof(options)));
+  ClientSettings settings;
+  settings.socketPaths =
+      options.socket_path == nullptr ? defaultSocketPaths() : std::vector<std::string>{options.socket_path};
+  if (options.queue_bytes != 0) settings.queueBytes = options.queue_bytes;
+  settings.isOnce = (options.flags & TWR_CLIENT_ONCE) != 0;
+  settings.stateChanged = options.state_changed;
+  settings.context = options.context;
+  return settings;
+}
+
+double secondsNow() {
+  timespec now{};
+  ::clock_gettime(CLOCK_REALTIME, &now);
+  return static_cast<double>(now.tv_sec) + static_cast<double>(now.tv_nsec) * 1e-9;
+}
+
+RingMessage messageOf(std::uint32_t category, std::uint16_t type, const twr_payload& payload) {
+  RingMessage message{};
+  message.category = category;
+  message.type = type;
+  message.time = secondsNow();
+  message.entries = payload.entries;
+  message.bytes = {payload.bytes, payload.size};
+  return message;
+}
+
+twr_status problemOfMessage(const twr_payload* payload, std::size_t reporterIDs) {
+  if (payload == nullptr) return TWR_INVALID;
+  const twr_status problem = problemOfMap(*payload);
+  if (problem != TWR_OK) return problem;
+  return fitsMessageFrame(payload->size, reporterIDs) ? TWR_OK : TWR_TOO_LARGE;
+}
+
+// Positive, and none of the small numbers that people choose.
+std::int64_t randomIdentifier() {
+  std::uint64_t bits = 0;
+  if (::getrandom(&bits, sizeof(bits), GRND_NONBLOCK) != sizeof(bits)) {
+    bits = static_cast<std::uint64_t>(std::chrono::steady_clock::now().time_since_epoch().count()) *
+           0x9E3779B97F4A7C15U;
+  }
+  constexpr std::uint64_t kLarge = std::uint64_t{1} << 62U;
+  return static_cast<std::int64_t>((bits & (kLarge - 1)) | kLarge);
+}
+
+twr_status ask(twr_client* client, std::string_view method, const Arguments& arguments, PendingReply reply) {
+  if (client == nullptr) return TWR_INVALID;
+  return guarded([&] {
+    return client->engine.request([&](ClientOutbox& outbox) {
+      std::string body;
+      appendRequestBody(body, method, arguments);
+      return outbox.request(std::move(body), reply);
+    });
+  });
+}
+
+twr_status change(twr_session* session, SessionChange change, PendingReply reply) {
+  if (session == nullptr) return TWR_INVALID;
+  return guarded([&] {
+    return session->engine.request(
+        [&](ClientOutbox& outbox) { return outbox.change(*session, std::move(change), reply); });
+  });
+}
+
+}  // namespace
+
+twr_client* makeClient(ClientSettings settings) {
+  auto client = std::make_unique<twr_client>(std::move(settings));
+  return clientRegistry::add(client->engine) ? client.release() : nullptr;
+}
+
+}  // namespace tonewerk
+
+using namespace tonewerk;
+
+const char* twr_status_text(twr_status status) {
+  switch (status) {
+    case TWR_OK:
+      return "done";
+    case TWR_INVALID:
+      return "an argument is not valid";
+    case TWR_TOO_LARGE:
+      return "too large";
+    case TWR_FULL:
+      return "no room left";
+    case TWR_NO_MEMORY:
+      return "out of memory";
+    case TWR_NOT_CONNECTED:
+      return "not connected to the daemon";
+    case TWR_REFUSED:
+      return "the daemon refused the request";
+    case TWR_TIMED_OUT:
+      return "timed out";
+    case TWR_FORKED:
+      return "the object belongs to the parent process";
+    case TWR_WOULD_WAIT:
+      return "cannot wait inside a callback";
+  }
+  return "unknown status";
+}
+
+const char* twr_version(void) { return TONEWERK_VERSION; }
+
+// ---- the client ----
+
+twr_client* twr_client_create(const twr_client_options* options) {
+  return guarded<twr_client*>(nullptr, [&] { return makeClient(settingsOf(options)); });
+}
+
+void twr_client_destroy(twr_client* client, int timeout_ms) {
+  if (client == nullptr) return;
+  const bool hasForked = client->engine.hasForked();
+  if (!hasForked && ClientEngine::isInCallback()) return;
+  if (!hasForked) client->engine.end(milliseconds(timeout_ms));
+  clientRegistry::remove(client->engine);
+  delete client;
+}
+
+twr_status twr_client_connect(twr_client* client, int timeout_ms) {
+  if (client == nullptr) return TWR_INVALID;
+  return guarded([&] { return client->engine.connect(milliseconds(timeout_ms)); });
+}
+
+twr_status twr_client_flush(twr_client* client, int timeout_ms) {
+  if (client == nullptr) return TWR_INVALID;
+  return guarded([&] { return client->engine.flush(milliseconds(timeout_ms)); });
+}
+
+twr_status twr_client_get_info(const twr_client* client, twr_client_info* info) {
+  if (client == nullptr || info == nullptr) return TWR_INVALID;
+  const std::size_t size = std::min(info->size, sizeof(twr_client_info));
+  twr_client_info known = client->engine.info();
+  known.size = info->size;
+  std::memcpy(info, &known, size);
+  return client->engine.hasForked() ? TWR_FORKED : TWR_OK;
+}
+
+twr_status twr_client_send(twr_client* client, uint32_t category, uint16_t type, const twr_payload* payload,
+                           const int64_t* reporter_ids, size_t count, twr_reply reply, void* context) {
+  if (client == nullptr || (reporter_ids == nullptr && count > 0)) return TWR_INVALID;
+  if (const twr_status problem = problemOfMessage(payload, count); problem != TWR_OK) return problem;
+  return guarded([&] {
+    return client->engine.request([&](ClientOutbox& outbox) {
+      return outbox.send(nullptr, messageOf(category, type, *payload), {reporter_ids, count},
+                         {reply, context});
+    });
+  });
+}
+
+twr_status twr_client_get_service_type(twr_client* client, int64_t reporter_id, twr_reply reply,
+                                       void* context) {
+  return ask(client, "getServiceNameForReporterID", {Value(reporter_id)},
+             {reply, context, AnswerKind::kServiceType});
+}
+
+twr_status twr_client_validate(twr_client* client, int64_t reporter_id, twr_reply reply, void* context) {
+  return ask(client, "reporterIDValid", {Value(reporter_id)}, {reply, context, AnswerKind::kValidity});
+}
+
+twr_status twr_client_get_all_reporters(twr_client* client, twr_reply reply, void* context) {
+  return ask(client, "getAllReporters", {}, {reply, context, AnswerKind::kReporters});
+}
+
+twr_status twr_client_kill_service(twr_client* client, twr_reply reply, void* context) {
+  return ask(client, "killService", {}, {reply, context});
+}
+
+twr_status twr_client_request(twr_client* client, const char* method, const twr_payload* parameters,
+                              twr_reply reply, void* context) {
+  if (client == nullptr || method == nullptr || !isUtf8(method)) return TWR_INVALID;
+  if (parameters != nullptr) {
+    const twr_status problem = twr_payload_problem(parameters);
+    if (problem != TWR_OK) return problem;
+    if ((parameters->flags & kPayloadIsList) == 0) return TWR_INVALID;
+  }
+  return guarded([&] {
+    std::string body;
+    appendRequestBody(body, method, parameters);
+    if (body.size() + kFrameHeadBytes > kMostFrameBytes) return TWR_TOO_LARGE;
+    return client->engine.request([&](ClientOutbox& outbox) {
+      return outbox.request(std::move(body), {reply, context});
+    });
+  });
+}
+
+// ---- sessions ----
+
+twr_session* twr_session_create(twr_client* client, int64_t reporter_id) {
+  if (client == nullptr || client->engine.hasForked()) return nullptr;
+  const std::int64_t identifier = reporter_id == TWR_NEW_ID ? randomIdentifier() : reporter_id;
+  return guarded<twr_session*>(nullptr, [&] {
+    return client->engine.withOutbox(
+        [&](ClientOutbox& outbox) { return outbox.addSession(client->engine, identifier).get(); });
+  });
+}
+
+int64_t twr_session_id(const twr_session* session) { return session == nullptr ? 0 : session->identifier; }
+
+twr_status twr_session_set_service_type(twr_session* session, uint16_t service_type, twr_reply reply,
+                                        void* context) {
+  return change(session, {Kind::kServiceType, service_type, {}}, {reply, context});
+}
+
+twr_status twr_session_set_configuration(twr_session* session, const twr_payload* configuration,
+                                         twr_reply reply, void* context) {
+  if (session == nullptr || configuration == nullptr) return TWR_INVALID;
+  if (const twr_status problem = problemOfMap(*configuration); problem != TWR_OK) return problem;
+  if (!fitsMessageFrame(configuration->size, 1)) return TWR_TOO_LARGE;
+  return guarded([&] {
+    std::optional<ValueMap> map = mapOf(*configuration);
+    if (!map) return TWR_INVALID;
+    return change(session, {Kind::kConfiguration, TWR_SERVICE_UNKNOWN, std::move(*map)}, {reply, context});
+  });
+}
+
+twr_status twr_session_start(twr_session* session, twr_reply stopped, void* context) {
+  return change(session, {Kind::kStart, TWR_SERVICE_UNKNOWN, {}}, {stopped, context});
+}
+
+twr_status twr_session_send(twr_session* session, uint32_t category, uint16_t type,
+                            const twr_payload* payload, twr_reply reply, void* context) {
+  if (session == nullptr) return TWR_INVALID;
+  if (const twr_status problem = problemOfMessage(payload, 1); problem != TWR_OK) return problem;
+  return guarded([&] {
+    return session->engine.request([&](ClientOutbox& outbox) {
+      return outbox.send(session, messageOf(category, type, *payload), {&session->identifier, 1},
+                         {reply, context});
+    });
+  });
+}
+
+twr_status twr_session_stop(twr_session* session, twr_reply reply, void* context) {
+  return change(session, {Kind::kStop, TWR_SERVICE_UNKNOWN, {}}, {reply, context});
+}
+
+twr_status twr_session_destroy(twr_session* session, twr_reply reply, void* context) {
+  if (session == nullptr) return TWR_INVALID;
+  // In a child process the copy stays until its client's goes.
+  if (session->engine.hasForked()) return TWR_FORKED;
+  return guarded([&] {
+    return session->engine.withOutbox([&](ClientOutbox& outbox) {
+      return outbox.destroy(*session, {reply, context});
+    });
+  });
+}
+
+// ---- senders ----
+
+twr_sender* twr_sender_open(twr_session* session, size_t ring_bytes) {
+  if (session == nullptr || session->engine.hasForked()) return nullptr;
+  const std::size_t bytes = ring_bytes == 0 ? std::size_t{TWR_DEFAULT_RING_BYTES} : ring_bytes;
+  if (bytes > TWR_MOST_RING_BYTES) return nullptr;
+  return guarded<twr_sender*>(nullptr, [&] {
+    return session->engine.withOutbox([&](ClientOutbox& outbox) {
+      return outbox.openSender(*session, session->engine.hasForked(), bytes).get();
+    });
+  });
+}
+
+twr_status twr_sender_send(twr_sender* sender, uint32_t category, uint16_t type, const twr_payload* payload) {
+  if (sender == nullptr || payload == nullptr) return TWR_INVALID;
+  if (sender->hasForked.load(std::memory_order_relaxed)) return TWR_FORKED;
+  return sender->ring.push(category, type, *payload);
+}
+
+uint64_t twr_sender_dropped(const twr_sender* sender) {
+  return sender == nullptr ? 0 : sender->ring.dropped();
+}
+
+void twr_sender_close(twr_sender* sender) {
+  if (sender == nullptr || sender->hasForked.load()) return;
+  const std::shared_ptr<twr_session> session = sender->session.lock();
+  guarded(TWR_NO_MEMORY, [&] {
+    return session->engine.withOutbox([&](ClientOutbox& outbox) {
+      outbox.closeSender(*sender);
+      return TWR_OK;
+    });
+  });
+}

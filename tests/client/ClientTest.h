@@ -1,0 +1,136 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <condition_variable>
+#include <cstddef>
+#include <cstdint>
+#include <deque>
+#include <functional>
+#include <gtest/gtest.h>
+#include <memory>
+#include <mutex>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "client/ClientHandle.h"
+#include "client/ScriptedDaemon.h"
+#include "client/TestPayload.h"
+#include "support/TemporaryDirectory.h"
+#include "tonewerk/reporting.h"
+
+namespace tonewerk {
+
+// What a client called back, for a test on another thread to wait for.
+//
+//   twr_session_start(session, AnswerLog::note, log.as("stopped"));
+//   EXPECT_EQ(log.next(), "stopped: done");
+class AnswerLog {
+ public:
+  // A context by which answers are known. Valid as long as this object.
+  void* as(std::string name, std::function<void(const twr_answer&)> also = nullptr) {
+    const std::lock_guard lock(mutex_);
+    names_.push_back({this, std::move(name), std::move(also)});
+    return &names_.back();
+  }
+  static void note(void* context, const twr_answer* answer) {
+    const Name& name = *static_cast<Name*>(context);
+    if (name.also) name.also(*answer);
+    name.log->add(name.text + ": " + twr_status_text(answer->status));
+  }
+  static void noteState(void* context, twr_state state) {
+    static_cast<AnswerLog*>(context)->add("state " + std::to_string(state));
+  }
+
+  // The next answer that was not asked for yet; a test failure when none comes.
+  std::string next() {
+    std::unique_lock lock(mutex_);
+    const bool isThere = changed_.wait_for(lock, std::chrono::milliseconds(kScriptPatienceMs),
+                                           [&] { return taken_ < answers_.size(); });
+    EXPECT_TRUE(isThere) << "no answer";
+    return isThere ? answers_[taken_++] : std::string();
+  }
+  std::vector<std::string> rest() {
+    const std::lock_guard lock(mutex_);
+    std::vector<std::string> rest(answers_.begin() + static_cast<std::ptrdiff_t>(taken_), answers_.end());
+    taken_ = answers_.size();
+    return rest;
+  }
+  void add(std::string answer) {
+    const std::lock_guard lock(mutex_);
+    answers_.push_back(std::move(answer));
+    changed_.notify_all();
+  }
+
+ private:
+  struct Name {
+    AnswerLog* log;
+    std::string text;
+    std::function<void(const twr_answer&)> also;
+  };
+
+  std::mutex mutex_;
+  std::condition_variable changed_;
+  std::vector<std::string> answers_;
+  std::size_t taken_ = 0;
+  std::deque<Name> names_;
+};
+
+// A client of a scripted daemon, by the C interface, whose delays are short.
+class ClientTest : public testing::Test {
+ protected:
+  ~ClientTest() override { twr_client_destroy(client, 0); }
+
+  static ClientSettings settings(const std::string& path) {
+    ClientSettings chosen;
+    chosen.socketPaths = {path};
+    chosen.firstDelay = std::chrono::milliseconds(1);
+    chosen.mostDelay = std::chrono::milliseconds(4);
+    chosen.busyPoll = std::chrono::milliseconds(1);
+    chosen.idlePoll = std::chrono::milliseconds(1);
+    return chosen;
+  }
+  void makeClientWith(ClientSettings chosen) {
+    twr_client_destroy(client, 0);
+    client = makeClient(std::move(chosen));
+    ASSERT_NE(client, nullptr);
+  }
+  void destroyClient(int timeout = kScriptPatienceMs) {
+    twr_client_destroy(std::exchange(client, nullptr), timeout);
+  }
+  // A session of 77, and the connection on which it has been created.
+  std::unique_ptr<ScriptedConnection> connectWithSession() {
+    session = twr_session_create(client, 77);
+    auto connection = daemon->accept();
+    if (connection != nullptr) {
+      EXPECT_EQ(connection->nextText(), "createReportingSession 77");
+    }
+    return connection;
+  }
+  twr_status send(std::int64_t number, twr_reply reply = nullptr, void* context = nullptr) {
+    TestPayload payload;
+    twr_put_int(payload.get(), "number", number);
+    twr_put_double(payload.get(), "twreporting_timestamp", 1.5);
+    return twr_session_send(session, TWR_CATEGORY_VOLUME, TWR_TYPE_GENERIC, payload.get(), reply, context);
+  }
+  twr_client_info info() {
+    twr_client_info known{};
+    known.size = sizeof(known);
+    EXPECT_EQ(twr_client_get_info(client, &known), TWR_OK);
+    return known;
+  }
+  // What the frame of send(number) is.
+  static std::string message(int number, const std::string& more = "") {
+    return "sendMessage {\"number\":" + std::to_string(number) + ",\"twreporting_timestamp\":1.5" + more +
+           "} 14 0 [77]";
+  }
+
+  TemporaryDirectory directory;
+  const std::string path = directory.path("reporting.sock");
+  std::unique_ptr<ScriptedDaemon> daemon = std::make_unique<ScriptedDaemon>(path);
+  AnswerLog log;
+  twr_client* client = makeClient(settings(path));
+  twr_session* session = nullptr;
+};
+
+}  // namespace tonewerk
