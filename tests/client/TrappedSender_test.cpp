@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "platform/linux/BoundedCommand.h"
+#include "support/TemporaryDirectory.h"
 
 namespace tonewerk {
 namespace {
@@ -17,7 +18,8 @@ constexpr int kTrapped = 1;
 constexpr int kNotPermitted = 3;
 
 BoundedCommand::Result run(const std::string& action, bool trapsSystemCalls) {
-  std::vector<std::string> arguments{TONEWERK_TRAPPED_SENDER, action};
+  const TemporaryDirectory directory;
+  std::vector<std::string> arguments{TONEWERK_TRAPPED_SENDER, directory.path("socket"), action};
   if (!trapsSystemCalls) arguments.emplace_back("without-system-calls");
   return BoundedCommand(std::move(arguments), {std::chrono::seconds(60)}).run();
 }

@@ -8,7 +8,7 @@
 //
 // ACTION is "send", or something that has to be trapped, which is done once among the sending.
 
-#include <atomic>
+#include <array>
 #include <cstdint>
 #include <cstdio>
 #include <cstdlib>
@@ -17,20 +17,32 @@
 #include <map>
 #include <mutex>
 #include <new>
+#include <optional>
 #include <pthread.h>
 #include <semaphore.h>
 #include <shared_mutex>
 #include <string>
+#include <sys/socket.h>
 #include <thread>
+#include <tuple>
 #include <unistd.h>
 
-#include "client/MessageRing.h"
 #include "client/programs/traps.h"
+#include "platform/linux/FileDescriptor.h"
+#include "platform/linux/UnixAddress.h"
+#include "tonewerk/reporting.h"
 
 namespace {
 
 constexpr std::uint32_t kMessages = 100'000;
-constexpr std::size_t kRingBytes = 4096;
+constexpr std::size_t kRingBytes = 4096;  // runs full long before the background thread comes again
+constexpr int kPatienceMs = 30'000;
+
+// Exit statuses.
+constexpr int kTrapped = 1;
+constexpr int kCannot = 2;
+constexpr int kNotPermitted = 3;
+constexpr int kMiscounted = 4;
 
 // Compilers may leave out an allocation whose result goes nowhere.
 void* volatile theMemory = nullptr;
@@ -64,17 +76,44 @@ const std::map<std::string, std::function<void()>>& misdeeds() {
   return all;
 }
 
+// Who reads what the client sends, and throws it away until the client hangs up.
+class Reader {
+ public:
+  explicit Reader(const std::string& path) : listener_(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0)) {
+    const std::optional<sockaddr_un> address = tonewerk::unixAddressOf(path);
+    isListening_ = address && ::bind(listener_.get(), tonewerk::generic(*address), sizeof(*address)) == 0 &&
+                   ::listen(listener_.get(), 1) == 0;
+    if (isListening_) thread_ = std::thread([this] { read(); });
+  }
+  ~Reader() {
+    if (thread_.joinable()) thread_.join();
+  }
+
+  bool isListening() const { return isListening_; }
+
+ private:
+  void read() const {
+    const tonewerk::FileDescriptor client(::accept(listener_.get(), nullptr, nullptr));
+    std::array<char, 65536> bytes;
+    while (::recv(client.get(), bytes.data(), bytes.size(), 0) > 0) {
+    }
+  }
+
+  const tonewerk::FileDescriptor listener_;
+  bool isListening_ = false;
+  std::thread thread_;
+};
+
 struct Run {
-  tonewerk::MessageRing ring{kRingBytes};
+  twr_sender* sender = nullptr;
   const std::function<void()>* misdeed = nullptr;
   bool forbidsSystemCalls = true;
   int problem = 0;  // why they cannot be
   std::uint64_t sent = 0;
-  std::uint64_t taken = 0;
-  std::atomic<bool> isDone{false};
+  std::uint64_t dropped = 0;
 };
 
-// Every function that builds, one failure, and the ring's answer to each, whatever it is.
+// Every function that builds, one failure, and the sender's answer to each, whatever it is.
 void sendOne(Run& run, std::uint32_t number) {
   unsigned char memory[256];
   twr_payload payload;
@@ -91,7 +130,11 @@ void sendOne(Run& run, std::uint32_t number) {
   twr_close(&payload);
   twr_close(&payload);
   if (number % 1000 == 0) twr_put_text(&payload, "bad", "\xFF");
-  if (run.ring.push(TWR_CATEGORY_IO, TWR_TYPE_STATE, payload) == TWR_OK) ++run.sent;
+  if (twr_sender_send(run.sender, TWR_CATEGORY_IO, TWR_TYPE_STATE, &payload) == TWR_OK) {
+    ++run.sent;
+  } else {
+    ++run.dropped;
+  }
 }
 
 void* sendAll(void* given) {
@@ -105,53 +148,72 @@ void* sendAll(void* given) {
     }
     traps_end();
   }
-  run.isDone = true;
   traps_exit();
   return nullptr;
 }
 
-void takeAll(Run& run) {
-  bool isDone = false;
-  while (!isDone) {
-    isDone = run.isDone;
-    // Lets the ring run full once, however the threads are scheduled.
-    if (run.ring.dropped() < 2 && !isDone) continue;
-    for (; run.ring.front(); run.ring.pop()) ++run.taken;
-  }
+// What the traps have to say; none for nothing.
+std::string trapped() {
+  if (traps_function() != nullptr) return traps_function();
+  if (traps_system_call() >= 0) return "system call " + std::to_string(traps_system_call());
+  return {};
 }
 
-int report(const Run& run) {
+// Whether everything that was taken has gone out, and every loss is counted.
+bool isAccountedFor(const Run& run, twr_client* client) {
+  twr_client_info info{};
+  info.size = sizeof(info);
+  if (twr_client_flush(client, kPatienceMs) != TWR_OK || twr_client_get_info(client, &info) != TWR_OK) {
+    return false;
+  }
+  // One more that says what no later message carried.
+  const bool isSent = info.messages_sent == run.sent || info.messages_sent == run.sent + 1;
+  return isSent && info.messages_dropped == run.dropped && run.sent + run.dropped == kMessages;
+}
+
+int report(const Run& run, twr_client* client) {
   if (run.problem != 0) {
     std::printf("%s\n", std::strerror(run.problem));
-    return 3;
+    return kNotPermitted;
   }
-  if (traps_function() != nullptr) {
-    std::printf("trapped %s\n", traps_function());
-    return 1;
+  if (const std::string what = trapped(); !what.empty()) {
+    std::printf("trapped %s\n", what.c_str());
+    return kTrapped;
   }
-  if (traps_system_call() >= 0) {
-    std::printf("trapped system call %d\n", traps_system_call());
-    return 1;
+  std::printf("taken %llu dropped %llu\n", static_cast<unsigned long long>(run.sent),
+              static_cast<unsigned long long>(run.dropped));
+  return isAccountedFor(run, client) ? 0 : kMiscounted;
+}
+
+int runAll(Run& run, const std::string& socketPath) {
+  const Reader reader(socketPath);
+  twr_client_options options{};
+  options.size = sizeof(options);
+  options.socket_path = socketPath.c_str();
+  twr_client* client = twr_client_create(&options);
+  twr_session* session = twr_session_create(client, TWR_NEW_ID);
+  run.sender = twr_sender_open(session, kRingBytes);
+  pthread_t thread{};
+  if (!reader.isListening() || twr_client_connect(client, kPatienceMs) != TWR_OK || run.sender == nullptr ||
+      pthread_create(&thread, nullptr, sendAll, &run) != 0) {
+    std::_Exit(kCannot);
   }
-  const auto dropped = static_cast<unsigned long long>(run.ring.dropped());
-  std::printf("taken %llu dropped %llu\n", static_cast<unsigned long long>(run.taken), dropped);
-  return run.taken == run.sent && run.taken + dropped == kMessages ? 0 : 4;
+  pthread_join(thread, nullptr);
+  twr_sender_close(run.sender);
+  const int status = report(run, client);
+  twr_client_destroy(client, kPatienceMs);
+  return status;
 }
 
 }  // namespace
 
 int main(int count, char** arguments) {
   const auto& all = misdeeds();
-  const auto chosen = count > 1 ? all.find(arguments[1]) : all.end();
-  if (chosen == all.end()) return 2;
+  const auto chosen = count > 2 ? all.find(arguments[2]) : all.end();
+  if (chosen == all.end()) return kCannot;
   Run run;
   run.misdeed = &chosen->second;
-  run.forbidsSystemCalls = count == 2;
-
+  run.forbidsSystemCalls = count == 3;
   traps_prepare();
-  pthread_t thread{};
-  if (pthread_create(&thread, nullptr, sendAll, &run) != 0) return 2;
-  takeAll(run);
-  pthread_join(thread, nullptr);
-  return report(run);
+  return runAll(run, arguments[1]);
 }

@@ -1,0 +1,33 @@
+// SPDX-License-Identifier: Apache-2.0
+// Reports a session that plays for a moment, with messages from its audio thread.
+//   c++ -std=c++17 report.cpp $(pkg-config --cflags --libs libtwreporting) -pthread && ./a.out
+#include <chrono>
+#include <cstdio>
+#include <functional>
+#include <thread>
+#include <tonewerk/reporting.hpp>
+
+namespace tr = tonewerk::reporting;
+
+static void play(
+    tr::Sender& sender) {  // a real-time thread: nothing here locks, allocates or calls the system
+  for (int cycle = 0; cycle < 4; ++cycle) {
+    tr::Payload<128> payload;
+    payload.put("cycle", cycle).put("load", 0.25 * cycle);
+    sender.send(tr::Category::kPerformance, tr::Type::kState, payload);
+  }
+}
+
+int main() {
+  tr::Client client;
+  {
+    tr::Session session(client);
+    session.setServiceType(tr::Service::kLongFormAudio);
+    session.start([](const tr::Answer& stopped) { std::printf("stopped: %s\n", tr::text(stopped.status)); });
+
+    tr::Sender sender(session);
+    std::thread audio(play, std::ref(sender));
+    audio.join();
+  }  // the session stops here, and the daemon makes its reports
+  std::printf("report: %s\n", tr::text(client.flush(std::chrono::seconds(2))));
+}
