@@ -1,0 +1,45 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <algorithm>
+#include <chrono>
+#include <cstddef>
+#include <cstdint>
+#include <vector>
+
+namespace tonewerk {
+
+// How long each of many calls took, in nanoseconds, the clock's own time included.
+class Latencies {
+ public:
+  // Touches the memory for so many, so that measuring does not.
+  explicit Latencies(std::size_t count) : nanoseconds_(count) {}
+
+  template <class Call>
+  void measure(Call call) {
+    const auto before = std::chrono::steady_clock::now();
+    call();
+    const auto after = std::chrono::steady_clock::now();
+    nanoseconds_[count_++] = static_cast<std::int64_t>((after - before).count());
+  }
+
+  void sort() {
+    nanoseconds_.resize(count_);
+    std::sort(nanoseconds_.begin(), nanoseconds_.end());
+  }
+
+  // After sort(). `share` of the calls took no longer, 1 for all.
+  std::int64_t within(double share) const {
+    if (nanoseconds_.empty()) return 0;
+    const auto place = static_cast<std::size_t>(share * static_cast<double>(nanoseconds_.size()));
+    return nanoseconds_[std::min(place, nanoseconds_.size() - 1)];
+  }
+
+  std::size_t count() const { return count_; }
+
+ private:
+  std::vector<std::int64_t> nanoseconds_;
+  std::size_t count_ = 0;
+};
+
+}  // namespace tonewerk
