@@ -4,14 +4,13 @@
 #include <algorithm>
 #include <array>
 #include <chrono>
-#include <cstdint>
-#include <memory>
 #include <poll.h>
 #include <string_view>
 #include <sys/eventfd.h>
 #include <systemd/sd-bus.h>
 #include <unistd.h>
 
+#include "platform/linux/SdBus.h"
 #include "platform/linux/ThreadProperties.h"
 
 namespace tonewerk {
@@ -30,16 +29,6 @@ constexpr std::array<ServiceName, 2> kServices = {{
     {"net.hadess.PowerProfiles", "/net/hadess/PowerProfiles"},
 }};
 
-struct BusCloser {
-  void operator()(sd_bus* bus) const { sd_bus_close_unref(bus); }
-};
-using Bus = std::unique_ptr<sd_bus, BusCloser>;
-
-struct MessageReleaser {
-  void operator()(sd_bus_message* message) const { sd_bus_message_unref(message); }
-};
-using Message = std::unique_ptr<sd_bus_message, MessageReleaser>;
-
 // Waits for the bus or the end. False for the end.
 bool waitFor(int stop, const pollfd& other, std::chrono::milliseconds timeout) {
   std::array<pollfd, 2> waited = {pollfd{stop, POLLIN, 0}, other};
@@ -47,23 +36,11 @@ bool waitFor(int stop, const pollfd& other, std::chrono::milliseconds timeout) {
   return waited[0].revents == 0;
 }
 
-// What sd-bus wants to be waited for, in milliseconds; -1 for ever.
-std::chrono::milliseconds timeoutOf(sd_bus* bus) {
-  std::uint64_t until = 0;
-  if (sd_bus_get_timeout(bus, &until) < 0 || until == UINT64_MAX) return std::chrono::milliseconds(-1);
-  const auto now = std::chrono::duration_cast<std::chrono::microseconds>(
-                       std::chrono::steady_clock::now().time_since_epoch())
-                       .count();
-  const std::int64_t left = static_cast<std::int64_t>(until) - now;
-  constexpr std::int64_t kMost = 60'000'000;
-  return std::chrono::milliseconds(left <= 0 ? 0 : std::min(left, kMost) / 1000 + 1);
-}
-
 // One connection to the bus, from its opening to its loss.
 class Watch {
  public:
   Watch(const std::string& address, PowerProfileWatcher::ChangeHandler& handler)
-      : handler_(handler), bus_(open(address)) {
+      : handler_(handler), bus_(openBus(address, problem_)) {
     for (std::size_t at = 0; at < kServices.size(); ++at) services_[at] = {this, at, false};
   }
   Watch(const Watch&) = delete;
@@ -83,7 +60,7 @@ class Watch {
       const int events = sd_bus_get_events(bus_.get());
       if (events < 0) return true;
       const pollfd busEvents{sd_bus_get_fd(bus_.get()), static_cast<short>(events), 0};
-      if (!waitFor(stop, busEvents, timeoutOf(bus_.get()))) return false;
+      if (!waitFor(stop, busEvents, timeToNextBusWork(bus_.get()))) return false;
     }
   }
 
@@ -93,17 +70,6 @@ class Watch {
     std::size_t place = 0;
     bool isPowerSaver = false;
   };
-
-  static Bus open(const std::string& address) {
-    sd_bus* bus = nullptr;
-    if (address.empty()) {
-      sd_bus_open_system(&bus);
-    } else if (sd_bus_new(&bus) >= 0 && (sd_bus_set_address(bus, address.c_str()) < 0 ||
-                                         sd_bus_set_bus_client(bus, 1) < 0 || sd_bus_start(bus) < 0)) {
-      bus = sd_bus_unref(bus);
-    }
-    return Bus(bus);
-  }
 
   bool subscribe() {
     for (Service& service : services_) {
@@ -137,7 +103,7 @@ class Watch {
                                        "org.freedesktop.DBus.Properties", "Get") < 0) {
       return;
     }
-    const Message question(made);
+    const BusMessage question(made);
     sd_bus_message_set_auto_start(question.get(), 0);
     if (sd_bus_message_append(question.get(), "ss", name.name, "ActiveProfile") < 0) return;
     const auto answered = [](sd_bus_message* answer, void* data, sd_bus_error*) {
@@ -164,7 +130,8 @@ class Watch {
 
   PowerProfileWatcher::ChangeHandler& handler_;
   std::array<Service, kServices.size()> services_;
-  Bus bus_;  // last: its callbacks refer to the services
+  std::string problem_;  // of no use here: the bus is looked for again
+  Bus bus_;              // last: its callbacks refer to the services
 };
 
 void watch(int stop, const std::string& address, PowerProfileWatcher::ChangeHandler& handler) {
