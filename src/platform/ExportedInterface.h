@@ -19,10 +19,20 @@ struct Parameter {
   ParameterType type;
 };
 
+// kAny is for objects that answer with whatever they like, kNever for requests that are not answered.
+enum class ResultType { kNone, kBoolean, kUInt16, kMap, kInt64List, kAny, kNever };
+
+// What a request is answered with. Not every transport needs to know, and none checks it.
+struct Result {
+  ResultType type = ResultType::kNone;
+  std::string_view name;
+};
+
 // One request that an exported object understands.
 struct Method {
   std::string_view name;
   std::vector<Parameter> parameters;
+  Result result = {};
   // What an answer may come to. It counts against the connection's bound from the request on, since an answer
   // is only measured when it is too late to refuse it.
   std::size_t replyBytes = 0;

@@ -44,22 +44,24 @@ TWReportingServiceProtocol::ReporterIDs reporterIDsOf(const Argument& argument) 
 
 std::vector<Method> requestSet() {
   constexpr Parameter kReporterID{"reporterID", ParameterType::kInt64};
+  constexpr Parameter kServiceType{"serviceType", ParameterType::kUInt16};
+  constexpr Result kSuccess{ResultType::kBoolean, "success"};
   return {
-      {"createReportingSession", {kReporterID}},
-      {"setServiceType", {{"serviceType", ParameterType::kUInt16}, kReporterID}},
-      {"getServiceNameForReporterID", {kReporterID}},
-      {"setConfiguration", {{"configuration", ParameterType::kMap}, kReporterID}},
-      {"startReportingSessionForID", {kReporterID}},
+      {"createReportingSession", {kReporterID}, kSuccess},
+      {"setServiceType", {kServiceType, kReporterID}, kSuccess},
+      {"getServiceNameForReporterID", {kReporterID}, {ResultType::kUInt16, "serviceType"}},
+      {"setConfiguration", {{"configuration", ParameterType::kMap}, kReporterID}, kSuccess},
+      {"startReportingSessionForID", {kReporterID}, kSuccess},
       {"sendMessage",
        {{"message", ParameterType::kMap},
         {"category", ParameterType::kUInt32},
         {"type", ParameterType::kUInt16},
         {"reporterIDs", ParameterType::kInt64ListOrNone}}},
-      {"stopReportingSessionForID", {kReporterID}},
-      {"destroyReportingSession", {kReporterID}},
-      {"reporterIDValid", {kReporterID}},
-      {"getAllReporters", {}, kMostListBytes},
-      {"killService", {}},
+      {"stopReportingSessionForID", {kReporterID}, kSuccess},
+      {"destroyReportingSession", {kReporterID}, kSuccess},
+      {"reporterIDValid", {kReporterID}, {ResultType::kMap, "validity"}},
+      {"getAllReporters", {}, {ResultType::kInt64List, "reporterIDs"}, kMostListBytes},
+      {"killService", {}, {ResultType::kNever, ""}},
   };
 }
 

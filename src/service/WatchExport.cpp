@@ -50,14 +50,19 @@ WatchExport::~WatchExport() = default;
 
 const std::vector<Method>& WatchExport::methods() {
   static const std::vector<Method> methods{
-      {"watch.sessions", {{"first", ParameterType::kInt64}}, kMostSessionListingBytes, true},
+      {"watch.sessions",
+       {{"first", ParameterType::kInt64}},
+       {ResultType::kAny, "sessions"},
+       kMostSessionListingBytes,
+       true},
       {"watch.openMessages",
        {{"reporterIDs", ParameterType::kInt64ListOrNone},
         {"categories", ParameterType::kInt64ListOrNone},
         {"types", ParameterType::kInt64ListOrNone}},
+       {ResultType::kAny, "answer"},
        0,
        true},
-      {"watch.nextMessages", {}, MessageWatcher::kMostAnswerBytes, true},
+      {"watch.nextMessages", {}, {ResultType::kAny, "messages"}, MessageWatcher::kMostAnswerBytes, true},
   };
   return methods;
 }

@@ -130,7 +130,7 @@ TEST(RequestTokenTest, FinishesItsRequestOnceWhereverItIsCarried) {
 
 TEST(ExportedInterfaceTest, WhatIsForTheOwnerIsForTheDaemonsUserAndRoot) {
   constexpr std::uint32_t kOwner = 500;
-  const Method method{"watch", {}, 0, true};
+  const Method method{"watch", {}, {}, 0, true};
   EXPECT_EQ(problemWithCaller(method, kOwner, kOwner), std::nullopt);
   EXPECT_EQ(problemWithCaller(method, 0, kOwner), std::nullopt);
   const ReplyError refusal{std::string(kMessagingErrorDomain), kNotPermitted,
@@ -140,8 +140,8 @@ TEST(ExportedInterfaceTest, WhatIsForTheOwnerIsForTheDaemonsUserAndRoot) {
 }
 
 TEST(ExportedInterfaceTest, APeerOfWhomTheKernelSaysNothingIsNobodysOwner) {
-  EXPECT_NE(problemWithCaller(Method{"watch", {}, 0, true}, kNoUser, 500), std::nullopt);
-  EXPECT_NE(problemWithCaller(Method{"watch", {}, 0, true}, kNoUser, kNoUser), std::nullopt);
+  EXPECT_NE(problemWithCaller(Method{"watch", {}, {}, 0, true}, kNoUser, 500), std::nullopt);
+  EXPECT_NE(problemWithCaller(Method{"watch", {}, {}, 0, true}, kNoUser, kNoUser), std::nullopt);
 }
 
 TEST(ExportedInterfaceTest, EverythingElseIsForEverybody) {

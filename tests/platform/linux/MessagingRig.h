@@ -28,21 +28,22 @@ struct ReceivedRequest {
 
 // One method for every parameter type, and some that answer in their own way.
 inline const ExportedInterface& rigInterface() {
+  constexpr Parameter kNumber{"number", ParameterType::kInt64};
+  constexpr Parameter kMap{"map", ParameterType::kMap};
+  constexpr Result kAnswer{ResultType::kAny, "answer"};
   static const ExportedInterface interface {
     {
-      {"takeInt64", {{"number", ParameterType::kInt64}}},
-          {"takeUInt32", {{"number", ParameterType::kUInt32}}},
-          {"takeUInt16", {{"number", ParameterType::kUInt16}}}, {"takeMap", {{"map", ParameterType::kMap}}},
-          {"takeList", {{"list", ParameterType::kInt64ListOrNone}}},
-          {"takeTwo", {{"map", ParameterType::kMap}, {"number", ParameterType::kInt64}}},
-          {"echo", {{"map", ParameterType::kMap}}},            // answers with the map
-          {"answerTwice", {}},                                 // 1, then 2
-          {"fail", {}},                                        // an error
-          {"hold", {{"number", ParameterType::kInt64}}},       // keeps token and reply
-          {"holdReply", {{"number", ParameterType::kInt64}}},  // keeps the reply alone
-          {"holdMap", {{"map", ParameterType::kMap}}},         // keeps token and reply
-          {"holdLarge", {}, std::size_t{1} << 20},             // likewise; its answer may come to a MiB
-          {"takeFromOwner", {{"number", ParameterType::kInt64}}, 0, true},  // for the daemon's user alone
+      {"takeInt64", {kNumber}}, {"takeUInt32", {{"number", ParameterType::kUInt32}}},
+          {"takeUInt16", {{"number", ParameterType::kUInt16}}}, {"takeMap", {kMap}},
+          {"takeList", {{"list", ParameterType::kInt64ListOrNone}}}, {"takeTwo", {kMap, kNumber}},
+          {"echo", {kMap}, kAnswer},                         // answers with the map
+          {"answerTwice", {}, kAnswer},                      // 1, then 2
+          {"fail", {}},                                      // an error
+          {"hold", {kNumber}, kAnswer},                      // keeps token and reply
+          {"holdReply", {kNumber}, kAnswer},                 // keeps the reply alone
+          {"holdMap", {kMap}, kAnswer},                      // keeps token and reply
+          {"holdLarge", {}, kAnswer, std::size_t{1} << 20},  // likewise; its answer may come to a MiB
+          {"takeFromOwner", {kNumber}, {}, 0, true},         // for the daemon's user alone
     }
   };
   return interface;
