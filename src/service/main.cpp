@@ -6,6 +6,7 @@
 #include <csignal>
 #include <iostream>
 #include <memory>
+#include <mutex>
 #include <pthread.h>
 #include <string>
 #include <string_view>
@@ -17,6 +18,7 @@
 #include "platform/LogLine.h"
 #include "platform/Platform.h"
 #include "platform/linux/CurlHttpClient.h"
+#include "platform/linux/DbusListener.h"
 #include "platform/linux/DiagnosticsStore.h"
 #include "platform/linux/Directories.h"
 #include "platform/linux/LinuxCapsa.h"
@@ -33,6 +35,7 @@
 #include "platform/linux/UnixSocketListener.h"
 #include "platform/linux/WatchdogFeeder.h"
 #include "service/TWReportingService.h"
+#include "service/TWReportingServiceExport.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingUtility.h"
 #include "workers/TWReportingWorkerClasses.h"
@@ -70,6 +73,11 @@ std::unique_ptr<WatchdogFeeder> watchdogOf(const ServiceManager& manager, const 
   return std::make_unique<WatchdogFeeder>(*interval, clock, [&manager] { manager.ping(); });
 }
 
+DbusNames dbusNames() {
+  return {"com.orvane.tonewerk.reporting", "/com/orvane/tonewerk/reporting",
+          "com.orvane.tonewerk.TWReportingServiceProtocol"};
+}
+
 // The daemon's parts, in the order in which they need one another.
 class Daemon {
  public:
@@ -88,7 +96,9 @@ class Daemon {
         diagnostics_(linux.diagnostics()),
         context_(platformOf(linux, directories), allWorkerClasses()),
         service_(TWReportingService::make([this] { endOnKillRequest(); })),
-        listener_(std::move(socket), log, watchdogOf(manager, linux.clock())) {
+        listener_(std::move(socket), log, watchdogOf(manager, linux.clock())),
+        dbusListener_(dbusNames(), TWReportingServiceExport::exportedInterface(),
+                      dbusAddressFromEnvironment(), log) {
     diagnostics_.removeLeftovers();  // the socket is ours, so no other daemon writes there
     const bool traces = isTracingBuiltIn() && context_.isInternalBuild();
     if (const std::error_code error = setSignpostMark(directories.runtime, traces)) {
@@ -96,12 +106,15 @@ class Daemon {
     }
     listener_.setDelegate(*service_);
     listener_.resume();
+    dbusListener_.setDelegate(*service_);
+    dbusListener_.resume();
   }
 
   // Every client is treated as lost, so that its started sessions stop and report.
   void endInOrder() {
     manager_.tellStopping("Finishing sessions and reports");
     listener_.shutDown();
+    dbusListener_.shutDown();
     SerialQueue& queue = context_.reportingServerQueue();
     queue.async([this] {
       service_->stopSingleMessageSession();
@@ -120,6 +133,7 @@ class Daemon {
 
   // No session stops; what the sinks already have is written.
   [[noreturn]] void endOnKillRequest() {
+    const std::lock_guard lock(killMutex_);
     manager_.tellStopping("Killed by a client; finishing reports");
     flushSinks();
     ::_exit(kKilled);
@@ -146,6 +160,8 @@ class Daemon {
   TWReportingContext context_;
   std::shared_ptr<TWReportingService> service_;
   UnixSocketListener listener_;
+  DbusListener dbusListener_;
+  std::mutex killMutex_;  // two front ends may get the request at once
 };
 
 // Signals that end the daemon; blocked in every thread, so that main() alone takes them.

@@ -4,57 +4,14 @@
 #include <array>
 #include <chrono>
 #include <deque>
-#include <fcntl.h>
-#include <fstream>
 #include <gtest/gtest.h>
 #include <mutex>
-#include <signal.h>
-#include <sys/wait.h>
 #include <systemd/sd-bus.h>
-#include <unistd.h>
 
-#include "support/TemporaryDirectory.h"
+#include "platform/linux/PrivateBus.h"
 
 namespace tonewerk {
 namespace {
-
-// A D-Bus of the test's own.
-class PrivateBus {
- public:
-  PrivateBus() {
-    std::ofstream(directory_.path("bus.conf"))
-        << "<busconfig><type>session</type><listen>unix:path=" << directory_.path("bus")
-        << "</listen><auth>EXTERNAL</auth><policy context=\"default\"><allow send_destination=\"*\"/>"
-           "<allow eavesdrop=\"true\"/><allow own=\"*\"/></policy></busconfig>";
-    std::array<int, 2> ready{};
-    EXPECT_EQ(pipe(ready.data()), 0);
-    process_ = fork();
-    if (process_ == 0) {
-      const std::string configuration = "--config-file=" + directory_.path("bus.conf");
-      const std::string report = "--print-address=" + std::to_string(ready[1]);
-      execlp("dbus-daemon", "dbus-daemon", "--nofork", configuration.c_str(), report.c_str(), nullptr);
-      _exit(127);
-    }
-    close(ready[1]);
-    char byte = 0;
-    isRunning_ = read(ready[0], &byte, 1) == 1;
-    close(ready[0]);
-  }
-  PrivateBus(const PrivateBus&) = delete;
-  PrivateBus& operator=(const PrivateBus&) = delete;
-  ~PrivateBus() {
-    kill(process_, SIGTERM);
-    waitpid(process_, nullptr, 0);
-  }
-
-  bool isRunning() const { return isRunning_; }
-  std::string address() const { return "unix:path=" + directory_.path("bus"); }
-
- private:
-  TemporaryDirectory directory_;
-  pid_t process_ = -1;
-  bool isRunning_ = false;
-};
 
 constexpr char kName[] = "net.hadess.PowerProfiles";
 constexpr char kPath[] = "/net/hadess/PowerProfiles";

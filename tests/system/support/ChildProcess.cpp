@@ -24,12 +24,31 @@ namespace {
 constexpr std::chrono::milliseconds kPollInterval{10};
 
 // Variables that would lead a child to what is not the test's own.
-constexpr std::array<std::string_view, 16> kForeignVariables = {
-    "RUNTIME_DIRECTORY", "STATE_DIRECTORY", "LOGS_DIRECTORY",  "CONFIGURATION_DIRECTORY",
-    "LISTEN_FDS",        "LISTEN_PID",      "LISTEN_FDNAMES",  "JOURNAL_STREAM",
-    "NOTIFY_SOCKET",     "TONEWERK_LOG",    "WATCHDOG_USEC",   "WATCHDOG_PID",
-    "XDG_STATE_HOME",    "XDG_CONFIG_HOME", "PIPEWIRE_REMOTE", "TONEWERK_REPORTING_SOCKET",
+constexpr std::array<std::string_view, 19> kForeignVariables = {
+    "RUNTIME_DIRECTORY",
+    "STATE_DIRECTORY",
+    "LOGS_DIRECTORY",
+    "CONFIGURATION_DIRECTORY",
+    "LISTEN_FDS",
+    "LISTEN_PID",
+    "LISTEN_FDNAMES",
+    "JOURNAL_STREAM",
+    "NOTIFY_SOCKET",
+    "TONEWERK_LOG",
+    "WATCHDOG_USEC",
+    "WATCHDOG_PID",
+    "XDG_STATE_HOME",
+    "XDG_CONFIG_HOME",
+    "PIPEWIRE_REMOTE",
+    "TONEWERK_REPORTING_SOCKET",
+    "DBUS_SESSION_BUS_ADDRESS",
+    "DBUS_SYSTEM_BUS_ADDRESS",
+    "DBUS_STARTER_ADDRESS",
 };
+
+// Where there is no D-Bus, rather than the machine's own.
+constexpr const char* kSystemBusVariable = "DBUS_SYSTEM_BUS_ADDRESS";
+constexpr const char* kNoBus = "unix:path=/nonexistent/bus";
 
 std::vector<std::string> environmentFor(const std::map<std::string, std::string>& changes) {
   std::vector<std::string> result;
@@ -39,6 +58,9 @@ std::vector<std::string> environmentFor(const std::map<std::string, std::string>
     bool isForeign = changes.contains(name);
     for (const std::string_view foreign : kForeignVariables) isForeign = isForeign || name == foreign;
     if (!isForeign) result.emplace_back(text);
+  }
+  if (!changes.contains(kSystemBusVariable)) {
+    result.emplace_back(kSystemBusVariable).append("=").append(kNoBus);
   }
   for (const auto& [name, value] : changes) result.emplace_back(name).append("=").append(value);
   return result;

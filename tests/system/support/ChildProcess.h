@@ -18,7 +18,7 @@ inline constexpr std::chrono::seconds kSystemPatience{30};
 bool waitUntil(const std::function<bool()>& condition, std::chrono::milliseconds timeout = kSystemPatience);
 
 // What a process is started with. The environment is this process's, without what systemd or a test runner
-// put there for itself, changed by `environment`.
+// put there for itself and without the machine's D-Bus, changed by `environment`.
 struct ChildCommand {
   std::string program;  // looked for in PATH when it has no slash
   std::vector<std::string> arguments;

@@ -10,7 +10,8 @@
 
 namespace tonewerk {
 
-// The daemon, as a process of its own in directories of its own, which go when the object goes.
+// The daemon, as a process of its own in directories of its own, which go when the object goes. It finds no
+// D-Bus unless it is given the address of one.
 //
 //   DaemonProcess daemon;
 //   daemon.writeConfiguration("device-facts.toml", "InternalBuild = true\n");
