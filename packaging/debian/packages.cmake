@@ -39,7 +39,7 @@ It touches no audio, and sends nothing anywhere unless it is told to.")
 set(CPACK_DEBIAN_DAEMON_PACKAGE_DEPENDS
   "systemd | systemd-standalone-sysusers | systemd-sysusers, systemd | systemd-standalone-tmpfiles | systemd-tmpfiles")
 set(CPACK_DEBIAN_DAEMON_PACKAGE_RECOMMENDS "tonewerk-reporting-tools")
-set(CPACK_DEBIAN_DAEMON_PACKAGE_SUGGESTS "apparmor, lttng-tools, pipewire-bin, procps")
+set(CPACK_DEBIAN_DAEMON_PACKAGE_SUGGESTS "apparmor, dbus, lttng-tools, pipewire-bin, procps")
 set(CPACK_DEBIAN_DAEMON_PACKAGE_CONTROL_EXTRA
   ${CMAKE_CURRENT_LIST_DIR}/daemon/postinst ${CMAKE_CURRENT_LIST_DIR}/daemon/prerm ${CMAKE_CURRENT_LIST_DIR}/daemon/postrm
   ${CMAKE_CURRENT_BINARY_DIR}/conffiles ${CMAKE_CURRENT_BINARY_DIR}/triggers)
