@@ -9,8 +9,8 @@
 
 #include "client/MessageFrame.h"
 #include "client/OneFrame.h"
-#include "client/PayloadOf.h"
 #include "client/TestPayload.h"
+#include "client/ValuePayload.h"
 #include "support/ValueGenerators.h"
 
 namespace tonewerk {
@@ -181,10 +181,10 @@ TEST_F(PayloadTest, NeedsNoMoreThanTheHeaderPromises) {
                                                              {Date{0.5}, 0}};
   for (const auto& [value, size] : values) {
     TestPayload exact(name.size() + size + kEntry);
-    EXPECT_EQ(put(exact.get(), name.c_str(), value), TWR_OK) << value.text().substr(0, 20);
+    EXPECT_EQ(putValue(exact.get(), name.c_str(), value), TWR_OK) << value.text().substr(0, 20);
   }
   TestPayload exact(name.size() + kContainer);
-  EXPECT_EQ(put(exact.get(), name.c_str(), ValueMap{}), TWR_OK);
+  EXPECT_EQ(putValue(exact.get(), name.c_str(), ValueMap{}), TWR_OK);
 }
 
 TEST_F(PayloadTest, HasNoRoomWithoutMemory) {
@@ -292,7 +292,7 @@ RC_GTEST_PROP(PayloadPropertyTest, HoldsWhatFittedBeforeWhereverTheMemoryEnds, (
   TestPayload payload(*rc::gen::inRange<std::size_t>(0, 200));
   ValueMap fitted;
   for (const ValueMapEntry& entry : map) {
-    if (put(payload.get(), std::string(entry.key).c_str(), entry.value) != TWR_OK) break;
+    if (putValue(payload.get(), std::string(entry.key).c_str(), entry.value) != TWR_OK) break;
     fitted.set(std::string(entry.key), entry.value);
   }
   RC_ASSERT((twr_payload_problem(payload.get()) == TWR_OK) == (fitted.size() == map.size()));

@@ -4,7 +4,7 @@
 #include <optional>
 #include <string_view>
 
-#include "client/ReportingClient.h"
+#include "tools/twctl/DaemonConnection.h"
 #include "tools/twctl/Tool.h"
 
 namespace tonewerk {
@@ -12,6 +12,8 @@ namespace tonewerk {
 // A command's connection to the daemon. What goes wrong is printed and becomes the tool's exit status.
 class Daemon {
  public:
+  using Answer = DaemonConnection::Answer;
+
   // `tool` outlives it.
   explicit Daemon(Tool& tool) : tool_(tool) {}
 
@@ -21,14 +23,14 @@ class Daemon {
   // The answer's result (none for nil) in `result`. False when the request was refused or not answered.
   bool call(std::string_view method, const Arguments& arguments, std::optional<Value>& result);
 
-  ReportingClient& client() { return client_; }
+  DaemonConnection& client() { return client_; }
 
   // "method: message (domain, code 2)".
   static std::string describe(std::string_view method, const ReplyError& error);
 
  private:
   Tool& tool_;
-  ReportingClient client_;
+  DaemonConnection client_;
 };
 
 }  // namespace tonewerk

@@ -22,8 +22,8 @@ double secondsSince1970() {
 
 }  // namespace
 
-RecordingPlayer::RecordingPlayer(ReportingClient& client, double speed, Refusal refusal)
-    : client_(client), speed_(speed), refusal_(std::move(refusal)) {}
+RecordingPlayer::RecordingPlayer(DaemonConnection& daemon, double speed, Refusal refusal)
+    : daemon_(daemon), speed_(speed), refusal_(std::move(refusal)) {}
 
 std::error_code RecordingPlayer::play(const Recording& recording) {
   const steady_clock::time_point start = steady_clock::now();
@@ -42,7 +42,7 @@ std::error_code RecordingPlayer::waitUntil(steady_clock::time_point time) {
   for (;;) {
     const auto left = std::chrono::ceil<milliseconds>(time - steady_clock::now());
     // Also without a pause: unread answers would in the end make the daemon stop reading.
-    const std::error_code error = client_.processAnswers(std::max(left, milliseconds::zero()));
+    const std::error_code error = daemon_.processAnswers(std::max(left, milliseconds::zero()));
     if (error && error != std::errc::timed_out) return error;
     if (left <= milliseconds::zero()) return {};
   }
@@ -53,7 +53,7 @@ std::error_code RecordingPlayer::waitForAnswers() {
   while (unanswered_ > 0 || endsDaemon_) {
     const auto left = std::chrono::ceil<milliseconds>(end - steady_clock::now());
     if (left <= milliseconds::zero()) return std::make_error_code(std::errc::timed_out);
-    const std::error_code error = client_.processAnswers(left);
+    const std::error_code error = daemon_.processAnswers(left);
     if (error) return error;
   }
   return {};
@@ -63,11 +63,11 @@ std::error_code RecordingPlayer::send(const RecordedCall& call) {
   const bool isStart = call.method == "startReportingSessionForID";
   const bool isKill = call.method == "killService";
   endsDaemon_ = endsDaemon_ || isKill;
-  const auto answered = [this, &call, isStart](const Answer& answer) {
+  const auto answered = [this, &call, isStart](const DaemonConnection::Answer& answer) {
     if (!isStart) --unanswered_;
     if (answer.error) refuse(call, Daemon::describe(call.method, *answer.error));
   };
-  const std::error_code error = client_.request(call.method, call.parametersAt(secondsSince1970()), answered);
+  const std::error_code error = daemon_.request(call.method, call.parametersAt(secondsSince1970()), answered);
   if (error == std::errc::message_size || error == std::errc::invalid_argument) {
     refuse(call, call.method + ": " + error.message());
     return {};

@@ -7,7 +7,7 @@
 #include <string>
 #include <system_error>
 
-#include "client/ReportingClient.h"
+#include "tools/twctl/DaemonConnection.h"
 #include "tools/twctl/Recording.h"
 
 namespace tonewerk {
@@ -18,9 +18,9 @@ class RecordingPlayer {
   // Told of each request that was refused: its line in the recording and why.
   using Refusal = std::function<void(const RecordedCall& call, const std::string& why)>;
 
-  // `speed` is above 0; 1 is as recorded, infinity without pauses. `client` is connected and outlives the
+  // `speed` is above 0; 1 is as recorded, infinity without pauses. `daemon` is connected and outlives the
   // player.
-  RecordingPlayer(ReportingClient& client, double speed, Refusal refusal);
+  RecordingPlayer(DaemonConnection& daemon, double speed, Refusal refusal);
 
   // Waits until every request is sent and answered, or the daemon is gone: no error after a request that ends
   // it. A start's answer is not waited for: it only comes with the session's stop.
@@ -34,7 +34,7 @@ class RecordingPlayer {
   std::error_code send(const RecordedCall& call);
   void refuse(const RecordedCall& call, const std::string& why);
 
-  ReportingClient& client_;
+  DaemonConnection& daemon_;
   const double speed_;
   const Refusal refusal_;
   std::size_t unanswered_ = 0;

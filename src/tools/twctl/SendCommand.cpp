@@ -59,8 +59,10 @@ void send(Tool& tool, const SendOptions& options) {
   Daemon daemon(tool);
   std::optional<Value> result;
   if (!daemon.connect()) return;
-  daemon.call("sendMessage",
-              ReportingClient::messageArguments(std::move(*payload), *category, *type, options.reporterIDs),
+  Argument recipients;
+  if (!options.reporterIDs.empty())
+    recipients = ValueArray(std::vector<Value>(options.reporterIDs.begin(), options.reporterIDs.end()));
+  daemon.call("sendMessage", {Value(std::move(*payload)), Value(*category), Value(*type), recipients},
               result);
 }
 

@@ -1,11 +1,16 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "tools/twctl/Tool.h"
 
+#include <cstdlib>
 #include <ostream>
 
-#include "client/ReportingClient.h"
-
 namespace tonewerk {
+namespace {
+
+constexpr const char* kSocketVariable = "TONEWERK_REPORTING_SOCKET";
+constexpr const char* kSocketName = "/reporting.sock";
+
+}  // namespace
 
 int Tool::fail(ExitStatus failure, std::string_view problem) const {
   out.flush();
@@ -18,8 +23,12 @@ Directories Tool::directories() const {
 }
 
 std::vector<std::string> Tool::socketPaths() const {
-  if (!systemWide) return ReportingClient::socketPaths();
-  return {Directories::system().runtime + "/reporting.sock"};
+  const std::string system = Directories::system().runtime + kSocketName;
+  if (systemWide) return {system};
+  if (const char* chosen = std::getenv(kSocketVariable); chosen != nullptr && *chosen != '\0')
+    return {chosen};
+  const std::string own = Directories::fromEnvironment().runtime + kSocketName;
+  return own == system ? std::vector{system} : std::vector{own, system};
 }
 
 }  // namespace tonewerk

@@ -1,0 +1,258 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "tools/twctl/DaemonConnection.h"
+
+#include <algorithm>
+#include <cstdint>
+#include <deque>
+#include <mutex>
+#include <poll.h>
+#include <sys/eventfd.h>
+#include <unistd.h>
+#include <utility>
+
+#include "client/ValuePayload.h"
+#include "platform/linux/FileDescriptor.h"
+#include "platform/linux/RpcFrameReader.h"
+#include "tonewerk/reporting.h"
+
+namespace tonewerk {
+namespace {
+
+using std::chrono::milliseconds;
+
+constexpr milliseconds kConnectTimeout{10'000};
+constexpr milliseconds kSendTimeout{10'000};
+constexpr milliseconds kCloseTimeout{1'000};
+// A recording without pauses is sent much faster than it is carried out.
+constexpr std::size_t kQueueBytes = std::size_t{4} << 20;
+
+std::error_code errorOf(twr_status status) {
+  switch (status) {
+    case TWR_OK:
+      return {};
+    case TWR_TOO_LARGE:
+      return std::make_error_code(std::errc::message_size);
+    case TWR_FULL:
+    case TWR_TIMED_OUT:
+      return std::make_error_code(std::errc::timed_out);
+    case TWR_NO_MEMORY:
+      return std::make_error_code(std::errc::not_enough_memory);
+    case TWR_NOT_CONNECTED:
+      return std::make_error_code(std::errc::connection_reset);
+    default:
+      return std::make_error_code(std::errc::invalid_argument);
+  }
+}
+
+// Reads results, which are values by themselves, as the frames that they came in.
+class ResultReader {
+ public:
+  std::optional<Value> read(const void* bytes, std::size_t size) {
+    if (size == 0) return std::nullopt;
+    frame_.assign("\x94\x01\x00\xC0", 4);  // a response to request 0, without an error
+    frame_.append(static_cast<const char*>(bytes), size);
+    std::string_view rest = frame_;
+    RpcFrameReader reader(texts_);
+    if (reader.next(rest) != RpcFrameReader::Result::kFrame) return std::nullopt;
+    return std::move(reader.frame().result);
+  }
+
+ private:
+  RpcTexts texts_;
+  std::string frame_;
+};
+
+}  // namespace
+
+// What has arrived. The library's thread puts, the caller's takes.
+class DaemonConnection::Inbox {
+ public:
+  struct Arrival {
+    AnswerHandler handler;
+    Answer answer;
+  };
+  enum class Wait { kArrived, kGone, kTimedOut };
+
+  Inbox() : event_(::eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK)) {}
+
+  int fileDescriptor() const { return event_.get(); }
+
+  void put(AnswerHandler handler, const twr_answer& answer) {
+    // Who is connected no more gets no answer; that the connection is gone is told by itself.
+    if (answer.status == TWR_NOT_CONNECTED) return;
+    Answer read;
+    if (answer.status == TWR_REFUSED) {
+      read.error = ReplyError{answer.error_domain, answer.error_code, answer.error_message};
+    } else {
+      read.result = reader_.read(answer.result, answer.result_size);
+    }
+    const std::lock_guard lock(mutex_);
+    arrived_.push_back({std::move(handler), std::move(read)});
+    signal();
+  }
+
+  void end() {
+    const std::lock_guard lock(mutex_);
+    isGone_ = true;
+    signal();
+  }
+
+  // Does not wait, whatever it says: kTimedOut is that there is nothing.
+  Wait state() {
+    const std::lock_guard lock(mutex_);
+    if (!arrived_.empty()) return Wait::kArrived;
+    return isGone_ ? Wait::kGone : Wait::kTimedOut;
+  }
+
+  Wait waitFor(milliseconds timeout) {
+    const auto until = std::chrono::steady_clock::now() + timeout;
+    for (;;) {
+      const Wait now = state();
+      const auto left = std::chrono::ceil<milliseconds>(until - std::chrono::steady_clock::now());
+      if (now != Wait::kTimedOut || left <= milliseconds::zero()) return now;
+      pollfd polled{event_.get(), POLLIN, 0};
+      ::poll(&polled, 1, static_cast<int>(std::min<milliseconds::rep>(left.count(), kLongestPollMs)));
+    }
+  }
+
+  std::deque<Arrival> takeAll() {
+    const std::lock_guard lock(mutex_);
+    // A connection that is gone stays readable.
+    std::uint64_t count = 0;
+    if (!isGone_ && ::read(event_.get(), &count, sizeof(count)) < 0) count = 0;
+    return std::exchange(arrived_, {});
+  }
+
+ private:
+  static constexpr milliseconds::rep kLongestPollMs = 60'000;
+
+  void signal() {
+    const std::uint64_t one = 1;
+    // Fails only where the counter is full, and then it is readable.
+    static_cast<void>(::write(event_.get(), &one, sizeof(one)) < 0);
+  }
+
+  const FileDescriptor event_;
+  ResultReader reader_;  // the library's thread's
+  std::mutex mutex_;     // guards what follows
+  std::deque<Arrival> arrived_;
+  bool isGone_ = false;
+};
+
+// The library's client.
+class DaemonConnection::Library {
+ public:
+  Library(const std::string& path, Inbox& inbox) : inbox_(inbox) {
+    twr_client_options options{};
+    options.size = sizeof(options);
+    options.socket_path = path.c_str();
+    options.queue_bytes = kQueueBytes;
+    options.flags = TWR_CLIENT_ONCE;
+    options.state_changed = [](void* context, twr_state state) {
+      if (state == TWR_STATE_ENDED) static_cast<Inbox*>(context)->end();
+    };
+    options.context = &inbox;
+    client_ = twr_client_create(&options);
+  }
+  Library(const Library&) = delete;
+  Library& operator=(const Library&) = delete;
+  ~Library() { twr_client_destroy(client_, static_cast<int>(kCloseTimeout.count())); }
+
+  std::error_code connect() {
+    const twr_status status = twr_client_connect(client_, static_cast<int>(kConnectTimeout.count()));
+    twr_client_info info{};
+    info.size = sizeof(info);
+    if (status == TWR_NOT_CONNECTED && twr_client_get_info(client_, &info) == TWR_OK && info.last_error != 0)
+      return {info.last_error, std::generic_category()};
+    return errorOf(status);
+  }
+
+  std::error_code request(std::string_view method, const Arguments& arguments, AnswerHandler handler) {
+    ValuePayload parameters;
+    if (const twr_status status = parameters.set(arguments); status != TWR_OK) return errorOf(status);
+    auto waiting = std::make_unique<Waiting>(Waiting{inbox_, std::move(handler)});
+    const std::string name(method);
+    const auto ask = [&] {
+      return twr_client_request(client_, name.c_str(), parameters.get(), &Library::answered, waiting.get());
+    };
+    twr_status status = ask();
+    if (status == TWR_FULL) {
+      status = twr_client_flush(client_, static_cast<int>(kSendTimeout.count()));
+      if (status == TWR_OK) status = ask();
+    }
+    if (status == TWR_OK) static_cast<void>(waiting.release());
+    return errorOf(status);
+  }
+
+ private:
+  struct Waiting {
+    Inbox& inbox;
+    AnswerHandler handler;
+  };
+
+  static void answered(void* context, const twr_answer* answer) {
+    const std::unique_ptr<Waiting> waiting(static_cast<Waiting*>(context));
+    waiting->inbox.put(std::move(waiting->handler), *answer);
+  }
+
+  Inbox& inbox_;
+  twr_client* client_ = nullptr;
+};
+
+DaemonConnection::DaemonConnection() = default;
+
+DaemonConnection::~DaemonConnection() = default;
+
+std::error_code DaemonConnection::connect(const std::vector<std::string>& paths) {
+  std::error_code error = std::make_error_code(std::errc::no_such_file_or_directory);
+  for (const std::string& path : paths) {
+    library_.reset();
+    inbox_ = std::make_unique<Inbox>();
+    library_ = std::make_unique<Library>(path, *inbox_);
+    error = library_->connect();
+    if (!error) return {};
+  }
+  library_.reset();
+  inbox_.reset();
+  return error;
+}
+
+int DaemonConnection::fileDescriptor() const { return inbox_ ? inbox_->fileDescriptor() : -1; }
+
+std::error_code DaemonConnection::request(std::string_view method, const Arguments& arguments,
+                                          AnswerHandler handler) {
+  if (!library_) return std::make_error_code(std::errc::not_connected);
+  return library_->request(method, arguments, std::move(handler));
+}
+
+std::error_code DaemonConnection::processAnswers(milliseconds timeout) {
+  if (!inbox_) return std::make_error_code(std::errc::not_connected);
+  switch (inbox_->waitFor(timeout)) {
+    case Inbox::Wait::kArrived:
+      for (const Inbox::Arrival& arrival : inbox_->takeAll()) {
+        if (arrival.handler) arrival.handler(arrival.answer);
+      }
+      return {};
+    case Inbox::Wait::kGone:
+      return std::make_error_code(std::errc::connection_reset);
+    case Inbox::Wait::kTimedOut:
+      break;
+  }
+  return timeout > milliseconds::zero() ? std::make_error_code(std::errc::timed_out) : std::error_code();
+}
+
+std::optional<DaemonConnection::Answer> DaemonConnection::call(std::string_view method,
+                                                               const Arguments& arguments,
+                                                               milliseconds timeout, std::error_code& error) {
+  const auto until = std::chrono::steady_clock::now() + timeout;
+  // Shared, because after a time-out the answer may still come.
+  const auto answer = std::make_shared<std::optional<Answer>>();
+  error = request(method, arguments, [answer](const Answer& given) { *answer = given; });
+  while (!error && !answer->has_value()) {
+    const auto left = std::chrono::ceil<milliseconds>(until - std::chrono::steady_clock::now());
+    error = left > milliseconds::zero() ? processAnswers(left) : std::make_error_code(std::errc::timed_out);
+  }
+  return *answer;
+}
+
+}  // namespace tonewerk
