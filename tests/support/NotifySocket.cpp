@@ -32,7 +32,7 @@ std::string NotifySocket::waitForLine(const std::string& line) {
   const auto end = std::chrono::steady_clock::now() + kPatience;
   for (;;) {
     const auto left = std::chrono::ceil<std::chrono::milliseconds>(end - std::chrono::steady_clock::now());
-    const std::string message = next(std::max(left, std::chrono::milliseconds::zero()));
+    std::string message = next(std::max(left, std::chrono::milliseconds::zero()));
     if (message.empty() || ("\n" + message + "\n").find("\n" + line + "\n") != std::string::npos) {
       return message;
     }

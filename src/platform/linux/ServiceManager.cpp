@@ -30,7 +30,7 @@ std::optional<std::chrono::milliseconds> ServiceManager::pingInterval() const {
   using std::chrono::milliseconds;
   std::uint64_t microseconds = 0;
   if (::sd_watchdog_enabled(kKeepVariables, &microseconds) <= 0) return std::nullopt;
-  constexpr std::uint64_t kHalfInMilliseconds = 2 * 1000;
+  constexpr std::uint64_t kHalfInMilliseconds = 2000;
   const std::uint64_t interval =
       std::min<std::uint64_t>(microseconds / kHalfInMilliseconds, milliseconds(kLongestPingInterval).count());
   return milliseconds(std::max<std::uint64_t>(interval, 1));
