@@ -129,7 +129,7 @@ struct DbusService::Handlers {
 
 DbusService::DbusService(const DbusNames& names, const std::string& address,
                          const DbusConnectionContext& context)
-    : names_(names), address_(address), context_(context), bus_(openBus(address, problem_)) {}
+    : names_(names), context_(context), bus_(openBus(address, problem_)) {}
 
 DbusService::~DbusService() {
   byIdentifier_.clear();

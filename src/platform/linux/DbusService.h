@@ -39,7 +39,7 @@ class DbusService {
     kLost,     // it is gone
   };
 
-  // All outlive the service. `address` as openBus() takes it.
+  // `names` and `context` outlive the service. `address` as openBus() takes it.
   DbusService(const DbusNames& names, const std::string& address, const DbusConnectionContext& context);
   DbusService(const DbusService&) = delete;
   DbusService& operator=(const DbusService&) = delete;
@@ -80,7 +80,6 @@ class DbusService {
   void remove(Client& client);
 
   const DbusNames& names_;
-  const std::string& address_;
   const DbusConnectionContext& context_;
   std::string problem_;
   bool isReached_ = false;  // the bus has answered
