@@ -10,6 +10,8 @@
 #include <random>
 #include <unistd.h>
 
+#include "client/ClientRegistry.h"
+
 namespace tonewerk {
 namespace {
 
@@ -19,8 +21,6 @@ constexpr const char* kThreadName = "tw-reporting";
 constexpr std::size_t kReadBytes = std::size_t{16} * 1024;
 // Reads, and writes, in a row before the other side has its turn.
 constexpr int kMostTransfers = 16;
-
-constinit thread_local bool isCalling = false;
 
 std::uint32_t seed() {
   const auto now = static_cast<std::uint64_t>(std::chrono::steady_clock::now().time_since_epoch().count());
@@ -56,7 +56,7 @@ void ClientEngine::wake() {
 }
 
 twr_status ClientEngine::connect(milliseconds timeout) {
-  if (isCalling) return TWR_WOULD_WAIT;
+  if (clientRegistry::isClientThread()) return TWR_WOULD_WAIT;
   if (hasForked_) return TWR_FORKED;
   Lock lock(mutex_);
   if (state_ == TWR_STATE_CONNECTED) return TWR_OK;
@@ -67,7 +67,7 @@ twr_status ClientEngine::connect(milliseconds timeout) {
 }
 
 twr_status ClientEngine::flush(milliseconds timeout) {
-  if (isCalling) return TWR_WOULD_WAIT;
+  if (clientRegistry::isClientThread()) return TWR_WOULD_WAIT;
   if (hasForked_) return TWR_FORKED;
   Lock lock(mutex_);
   if (outbox_.isEmpty()) return TWR_OK;
@@ -101,8 +101,6 @@ void ClientEngine::end(milliseconds timeout) {
   thread_.join();
 }
 
-bool ClientEngine::isInCallback() { return isCalling; }
-
 twr_client_info ClientEngine::info() const {
   const Lock lock(mutex_);
   twr_client_info info{};
@@ -121,7 +119,6 @@ twr_client_info ClientEngine::info() const {
 
 void ClientEngine::becomeForked() {
   hasForked_ = true;
-  isCalling = false;  // a callback may be where the process forked
   state_ = TWR_STATE_ENDED;
   socket_.close();
   event_.close();
@@ -131,6 +128,11 @@ void ClientEngine::becomeForked() {
 bool ClientEngine::hasThread() const {
   const Lock lock(mutex_);
   return thread_.isRunning() && !thread_.isThisThread();
+}
+
+bool ClientEngine::isThisThread() const {
+  const Lock lock(mutex_);
+  return thread_.isThisThread();
 }
 
 void ClientEngine::abandon() {
@@ -307,7 +309,6 @@ bool ClientEngine::deliver(Lock& lock) {
   if (deliveries_.empty()) return false;
   const Deliveries deliveries = std::exchange(deliveries_, {});
   lock.unlock();
-  isCalling = true;
   for (const Delivery& delivery : deliveries) {
     if (delivery.state) {
       settings_.stateChanged(settings_.context, *delivery.state);
@@ -316,7 +317,6 @@ bool ClientEngine::deliver(Lock& lock) {
     }
     if (hasForked_) break;
   }
-  isCalling = false;
   if (!hasForked_) lock.lock();
   return true;
 }

@@ -64,7 +64,6 @@ class ClientEngine {
   twr_status flush(std::chrono::milliseconds timeout);
   // Sends what is queued, within the time, and ends the thread. Nothing is called after it has returned.
   void end(std::chrono::milliseconds timeout);
-  static bool isInCallback();
 
   twr_client_info info() const;
   const std::atomic<bool>& hasForked() const { return hasForked_; }
@@ -76,7 +75,10 @@ class ClientEngine {
   void afterFork() { mutex_.unlock(); }
   // In the child, between the two.
   void becomeForked();
+  // One that may be joined from here.
   bool hasThread() const;
+  // Whether the caller is this client's thread, inside a callback.
+  bool isThisThread() const;
   // Ends the thread at once; nobody is told.
   void abandon();
 

@@ -67,4 +67,11 @@ void remove(ClientEngine& engine) {
   }
 }
 
+bool isClientThread() {
+  const std::lock_guard lock(mutex);
+  for (const ClientEngine* engine = first; engine != nullptr; engine = engine->nextClient)
+    if (engine->isThisThread()) return true;
+  return false;
+}
+
 }  // namespace tonewerk::clientRegistry

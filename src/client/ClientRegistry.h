@@ -11,6 +11,8 @@ namespace clientRegistry {
 // False without memory for what fork() is to call.
 bool add(ClientEngine& engine);
 void remove(ClientEngine& engine);
+// Whether the caller is the thread of a client, of whichever: inside a callback. Under no engine's mutex.
+bool isClientThread();
 
 }  // namespace clientRegistry
 }  // namespace tonewerk

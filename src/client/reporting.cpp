@@ -159,7 +159,7 @@ twr_client* twr_client_create(const twr_client_options* options) {
 void twr_client_destroy(twr_client* client, int timeout_ms) {
   if (client == nullptr) return;
   const bool hasForked = client->engine.hasForked();
-  if (!hasForked && ClientEngine::isInCallback()) return;
+  if (!hasForked && clientRegistry::isClientThread()) return;
   if (!hasForked) client->engine.end(milliseconds(timeout_ms));
   clientRegistry::remove(client->engine);
   delete client;

@@ -1,0 +1,68 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "client/OutgoingBatch.h"
+
+#include <gmock/gmock.h>
+
+namespace tonewerk {
+namespace {
+
+class OutgoingBatchTest : public testing::Test {
+ protected:
+  void add(const std::string& frame, std::uint32_t identifier,
+           OutgoingFrame::Origin origin = OutgoingFrame::Origin::kQueue) {
+    batch.bytes() += frame;
+    OutgoingFrame added;
+    added.identifier = identifier;
+    added.origin = origin;
+    batch.add(std::move(added));
+  }
+  static std::vector<std::uint32_t> identifiers(const std::vector<OutgoingFrame>& frames) {
+    std::vector<std::uint32_t> all;
+    for (const OutgoingFrame& frame : frames) all.push_back(frame.identifier);
+    return all;
+  }
+
+  OutgoingBatch batch;
+};
+
+TEST_F(OutgoingBatchTest, CountsAFrameAsGoneWithItsLastByte) {
+  add("abc", 1);
+  add("def", 2);
+  EXPECT_THAT(identifiers(batch.sent(2)), testing::IsEmpty());
+  EXPECT_THAT(identifiers(batch.sent(1)), testing::ElementsAre(1));
+  EXPECT_EQ(batch.unsent(), "def");
+  EXPECT_THAT(identifiers(batch.sent(2)), testing::IsEmpty());
+  EXPECT_THAT(identifiers(batch.takeBack()), testing::ElementsAre(2));
+  EXPECT_TRUE(batch.empty());
+  EXPECT_EQ(batch.unsent(), "");
+}
+
+TEST_F(OutgoingBatchTest, LetsGoOfAFrameWithoutBytesAfterThoseBeforeIt) {
+  add("abc", 1);
+  add("", 2);
+  EXPECT_THAT(identifiers(batch.sent(0)), testing::IsEmpty());
+  EXPECT_THAT(identifiers(batch.sent(3)), testing::ElementsAre(1, 2));
+  add("", 3);
+  EXPECT_THAT(identifiers(batch.sent(0)), testing::ElementsAre(3));
+}
+
+TEST_F(OutgoingBatchTest, GivesARingsMessageBackWithItsBody) {
+  add("##one", 1, OutgoingFrame::Origin::kRing);
+  add("##two", 2, OutgoingFrame::Origin::kRing);
+  batch.sent(6);
+  const std::vector<OutgoingFrame> back = batch.takeBack();
+  ASSERT_EQ(back.size(), 1U);
+  EXPECT_EQ(back[0].command.body, "two");
+}
+
+TEST_F(OutgoingBatchTest, IsFullAtItsBound) {
+  add(std::string(OutgoingBatch::kFullBytes - 1, 'x'), 1);
+  EXPECT_FALSE(batch.isFull());
+  add("x", 2);
+  EXPECT_TRUE(batch.isFull());
+  batch.sent(OutgoingBatch::kFullBytes);
+  EXPECT_FALSE(batch.isFull());
+}
+
+}  // namespace
+}  // namespace tonewerk
