@@ -1,6 +1,6 @@
 /* SPDX-License-Identifier: Apache-2.0 */
 /* Reports a session that plays for a moment, with messages from its audio thread.
- *   cc report.c $(pkg-config --cflags --libs libtwreporting) -pthread && ./a.out */
+ *   cc report.c $(pkg-config --cflags --libs twreporting) -pthread && ./a.out */
 #include <pthread.h>
 #include <stdio.h>
 #include <tonewerk/reporting.h>

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 // Reports a session that plays for a moment, with messages from its audio thread.
-//   c++ -std=c++17 report.cpp $(pkg-config --cflags --libs libtwreporting) -pthread && ./a.out
+//   c++ -std=c++17 report.cpp $(pkg-config --cflags --libs twreporting) -pthread && ./a.out
 #include <chrono>
 #include <cstdio>
 #include <functional>
