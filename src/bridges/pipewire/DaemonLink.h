@@ -3,43 +3,44 @@
 
 #include <chrono>
 #include <functional>
+#include <map>
 #include <memory>
 #include <string>
-#include <string_view>
-#include <vector>
 
 #include "bridges/pipewire/Diagnostics.h"
-#include "bridges/pipewire/EventLoop.h"
-#include "bridges/pipewire/RetryDelay.h"
+#include "bridges/pipewire/LoopInbox.h"
 #include "bridges/pipewire/SessionSink.h"
-#include "client/ReportingClient.h"
+#include "tonewerk/reporting.h"
 
 namespace tonewerk {
 
-// The connection to the reporting daemon, made again whenever it breaks.
+// The way to the reporting daemon: the client library, whose connection comes and goes by itself.
 //
-//   open()    connect -- no daemon --> wait, longer each time --> connect ...
+//   open()    no daemon yet: everything is swallowed
 //                |
-//             onConnected: users begin their sessions anew; nothing of an earlier connection is left
+//             onConnected(kFirst): users begin their sessions
 //                |
-//             requests -- broken or full --> wait --> connect ...
+//             the daemon goes: what is said waits, up to the library's bound
+//                |
+//             onConnected(kAgain): the library has made the sessions again. What they had been told before is
+//                                  gone with the old daemon, so users tell how things stand
 //
-// While there is no daemon, requests are swallowed and nothing is kept. A daemon that does not read holds the
-// thread for at most kSendTimeout, once: the connection then counts as broken.
-//
-// For the loop's thread.
+// Nothing here waits but finish(). For the loop's thread, on which everything is called back, too.
 class DaemonLink final : public SessionSink {
  public:
-  static constexpr std::chrono::milliseconds kSendTimeout{250};
+  enum class Connection { kFirst, kAgain };
 
-  // `paths` as ReportingClient::connect() takes them. `loop` and `diagnostics` outlive this.
-  DaemonLink(EventLoop& loop, const Diagnostics& diagnostics, std::vector<std::string> paths);
+  // `socketPath` empty: where the daemon usually is. `loop` and `diagnostics` outlive this.
+  DaemonLink(EventLoop& loop, const Diagnostics& diagnostics, std::string socketPath = {});
+  DaemonLink(const DaemonLink&) = delete;
+  DaemonLink& operator=(const DaemonLink&) = delete;
+  ~DaemonLink() override;
 
-  // Called once. `onConnected` must not destroy this.
-  void open(std::function<void()> onConnected);
-  bool isConnected() const { return client_.isConnected(); }
-  // The daemon's socket; valid while connected.
-  const std::string& socketPath() const { return client_.socketPath(); }
+  // Called once. `onConnected` must not destroy this. False without memory or descriptors.
+  bool open(std::function<void(Connection connection)> onConnected);
+  bool isConnected() const { return isConnected_; }
+  // Where the daemon is, or was last; empty before the first connection.
+  std::string socketPath() const;
 
   // Waits, at most `timeout`, until the daemon has done what it was asked. False when it has not.
   bool finish(std::chrono::milliseconds timeout);
@@ -53,22 +54,29 @@ class DaemonLink final : public SessionSink {
   void destroy(std::int64_t reporterID) override;
 
  private:
-  void connect();
-  void processAnswers();
-  void request(const char* method, const Arguments& arguments);
-  void reportRefusal(const char* method, const ReplyError& error);
-  void lost(const std::error_code& error);
+  struct Asked;
 
-  EventLoop& loop_;
+  twr_client_info info() const;
+  twr_session* session(std::int64_t reporterID) const;
+  // `call` makes a request with a reply that reports a refusal.
+  template <class Call>
+  void ask(const char* method, Call call);
+  static void answered(void* context, const twr_answer* answer);
+  static void stateChanged(void* context, twr_state state);
+  void changed(twr_state state, int error);
+  void connected();
+  void reportRefusal(const std::string& refusal);
+
   const Diagnostics& diagnostics_;
-  const std::vector<std::string> paths_;
-  std::function<void()> onConnected_;
-  ReportingClient client_;
-  RetryDelay retryDelay_;
+  const std::string chosenPath_;
+  std::function<void(Connection connection)> onConnected_;
+  bool isConnected_ = false;
+  bool wasConnected_ = false;
   bool saidAbsent_ = false;
   std::string lastRefusal_;  // said once, however often it comes in a row
-  std::unique_ptr<EventLoop::Timer> retryTimer_;
-  std::unique_ptr<EventLoop::Source> answers_;  // while connected
+  LoopInbox inbox_;
+  twr_client* client_ = nullptr;                   // puts into the inbox until it is destroyed
+  std::map<std::int64_t, twr_session*> sessions_;  // the client's
 };
 
 }  // namespace tonewerk

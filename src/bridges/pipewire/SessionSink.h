@@ -10,8 +10,8 @@ namespace tonewerk {
 
 // Where sessions go: the reporting daemon.
 //
-// Nothing fails and nothing waits. While the daemon is away everything is swallowed; when it is back, its
-// users are told to begin their sessions anew (see DaemonLink).
+// Nothing fails and nothing waits. Before the daemon is there everything is swallowed, and its users are then
+// told to begin their sessions; when it has been away, they are told to say how things stand (see DaemonLink).
 class SessionSink {
  public:
   virtual ~SessionSink() = default;

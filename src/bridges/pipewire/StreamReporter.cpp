@@ -43,6 +43,13 @@ void StreamReporter::restart() {
   hold();
 }
 
+void StreamReporter::retell() {
+  if (reporterID_ == 0) return;
+  told_.reset();
+  // What is held is told with all of the state in any case, and with the time at which it happened.
+  if (!held_) hold();
+}
+
 void StreamReporter::end() {
   tellHeld();
   playback_.running = false;

@@ -47,8 +47,10 @@ class StreamReporter {
 
   void update(const StreamState& state);
   void overloaded(const Overload& overload);
-  // The daemon has lost what it knew: a new session from the present state.
+  // Nothing said so far has reached a daemon: a new session from the present state.
   void restart();
+  // The session is there, but what it was told is lost: the present state again, told as it is now.
+  void retell();
   // The stream is gone. The last call.
   void end();
 

@@ -38,6 +38,11 @@ void StreamReports::restartAll() {
   rearm();
 }
 
+void StreamReports::retellAll() {
+  for (auto& [stream, reporter] : reporters_) reporter.retell();
+  rearm();
+}
+
 void StreamReports::deadlinesReached() {
   for (auto& [stream, reporter] : reporters_) reporter.deadlineReached();
   rearm();

@@ -24,8 +24,10 @@ class StreamReports final : public StreamObserver {
   // Ignored when there is no such stream.
   void streamOverloaded(std::uint32_t stream, const Overload& overload);
 
-  // The daemon has lost what it knew: every stream's session begins anew.
+  // Nothing said so far has reached a daemon: every stream's session begins anew.
   void restartAll();
+  // The sessions are there, but what they were told is lost: every stream tells how it plays.
+  void retellAll();
 
  private:
   void deadlinesReached();

@@ -34,7 +34,7 @@ int runBridge(const Diagnostics& diagnostics) {
 
   const SystemClock clock;
   ReporterIdentifiers identifiers(clock, getpid());
-  DaemonLink daemon(*loop, diagnostics, ReportingClient::socketPaths());
+  DaemonLink daemon(*loop, diagnostics);
   // Users of one daemon publish beside each other.
   const std::string user = std::to_string(getuid());
   DriverStatistics statistics;
@@ -46,10 +46,18 @@ int runBridge(const Diagnostics& diagnostics) {
   DriverReports drivers(model, statistics, reports, publisher, clock);
   {
     PipeWireGraph graph(*loop, model, drivers, diagnostics);
-    daemon.open([&] {
+    const auto onConnected = [&](DaemonLink::Connection connection) {
       publisher.open(std::filesystem::path(daemon.socketPath()).parent_path());
-      reports.restartAll();
-    });
+      if (connection == DaemonLink::Connection::kFirst) {
+        reports.restartAll();
+      } else {
+        reports.retellAll();
+      }
+    };
+    if (!daemon.open(onConnected)) {
+      diagnostics.say("cannot look for the reporting daemon: no memory or no descriptors");
+      return 1;
+    }
     if (!graph.open()) {
       diagnostics.say("cannot use PipeWire: its client configuration is missing or broken");
       return 1;

@@ -339,6 +339,33 @@ TEST_F(StreamReporterTest, SaysNothingOfAPausedStreamInANewSessionUntilItPlays) 
   EXPECT_THAT(told(1), ElementsAre("3 on 0.5 Speaker"));
 }
 
+TEST_F(StreamReporterTest, TellsHowItPlaysOnceMoreInTheSameSession) {
+  play();
+  clock.advance(1.0);
+  reports.retellAll();
+  clock.advance(1.0);
+  ASSERT_THAT(sink.sessions, SizeIs(1));
+  EXPECT_THAT(told(0), ElementsAre("0 on 0.5 Speaker", "2 on 0.5 Speaker"));
+}
+
+TEST_F(StreamReporterTest, TellsAHeldChangeOnceAndWithItsOwnTimeWhenAskedToTellAgain) {
+  play();
+  setVolume(0.3);
+  reports.retellAll();
+  clock.advance(1.0);
+  ASSERT_THAT(told(0), SizeIs(2));
+  EXPECT_EQ(told(0)[1], "1 on 0.3 Speaker");
+}
+
+TEST_F(StreamReporterTest, TellsNothingAgainOfAPausedStreamUntilItPlays) {
+  play();
+  run(false);
+  const std::size_t before = told(0).size();
+  reports.retellAll();
+  clock.advance(2.0);
+  EXPECT_THAT(told(0), SizeIs(before));
+}
+
 TEST_F(StreamReporterTest, TellsAnOverloadAtOnceUnderACategoryAndTypeOfItsOwn) {
   play();
   reports.streamOverloaded(kStream, {.time = kBegin + 0.5, .frames = 512, .cycle = 77, .xruns = 2});
