@@ -483,11 +483,12 @@ void ClientOutbox::absorbMessage(twr_session& session, RingMessage message, Comm
 }
 
 void ClientOutbox::removeSender(twr_sender& sender) {
-  dropped_ += sender.ring.dropped();
   const auto isIt = [&](const std::shared_ptr<twr_sender>& held) { return held.get() == &sender; };
+  // Something in the queue may still hold a mark on one that is gone.
+  if (std::erase_if(senders_, isIt) == 0) return;
+  dropped_ += sender.ring.dropped();
   const std::shared_ptr<twr_session> session = sender.session.lock();
   std::erase_if(session->senders, isIt);
-  std::erase_if(senders_, isIt);
   forgetIfGone(*session);
 }
 

@@ -415,6 +415,20 @@ TEST_F(ClientOutboxTest, SendsWhatAClosedSenderLeavesAndItsLoss) {
   EXPECT_EQ(outbox->messagesDropped(), 1U);
 }
 
+// A flush behind the close held a mark on the sender that had just gone, which then went a second time.
+TEST_F(ClientOutboxTest, CountsAClosedSendersLossOnce) {
+  const auto one = session();
+  outbox->connected();
+  sayAll();
+  const auto sender = outbox->openSender(*one, hasForked, 128);
+  push(*sender, 1);
+  EXPECT_EQ(push(*sender, 2), TWR_FULL);
+  outbox->closeSender(*sender);
+  outbox->addBarrier(std::make_shared<Waiter>());
+  EXPECT_EQ(sayAll().size(), 2U);
+  EXPECT_EQ(outbox->messagesDropped(), 1U);
+}
+
 TEST_F(ClientOutboxTest, KeepsWhatAClosedSenderLeavesWithoutADaemonInItsPlace) {
   const auto one = session();
   const auto sender = outbox->openSender(*one, hasForked, 128);
