@@ -228,6 +228,17 @@ TEST_F(DbusTest, TheSocketIsServedWhenTheBusGoesAndTheBusWhenItComesBack) {
   EXPECT_THAT(caller.ask("GetAllReporters").int64List(), ElementsAre(78));
 }
 
+class SystemDbusTest : public DaemonTest {};
+
+TEST_F(SystemDbusTest, WithoutASessionsBusTheSystemsIsServed) {
+  const PrivateBus system;
+  daemon.setEnvironment("DBUS_SYSTEM_BUS_ADDRESS", system.address());
+  ASSERT_TRUE(daemon.start());
+  ASSERT_TRUE(waitForLogLine("serving com.orvane.tonewerk.reporting on D-Bus"));
+  DbusCaller caller(system.address(), kNames);
+  EXPECT_TRUE(caller.ask("CreateReportingSession", "x", kSession).boolean());
+}
+
 class NoDbusTest : public RunningDaemonTest {};
 
 TEST_F(NoDbusTest, TheLackOfABusIsSaidOnceAndHarmsNothing) {

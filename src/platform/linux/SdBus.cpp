@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <cstdint>
+#include <cstdlib>
 #include <system_error>
 #include <systemd/sd-bus.h>
 
@@ -11,22 +12,19 @@ namespace {
 
 constexpr std::chrono::microseconds kLongestWait = std::chrono::minutes(1);
 
+// As the library has it.
+std::string systemBusAddress() {
+  const char* address = ::secure_getenv("DBUS_SYSTEM_BUS_ADDRESS");
+  return address == nullptr ? "unix:path=/run/dbus/system_bus_socket" : address;
+}
+
+// File descriptors are declined, and messages with some then stay with the bus: held messages could otherwise
+// use up this process's.
 int startAt(sd_bus* bus, const std::string& address) {
   if (const int result = sd_bus_set_address(bus, address.c_str()); result < 0) return result;
   if (const int result = sd_bus_set_bus_client(bus, 1); result < 0) return result;
+  if (const int result = sd_bus_negotiate_fds(bus, 0); result < 0) return result;
   return sd_bus_start(bus);
-}
-
-int open(const std::string& address, Bus& opened) {
-  sd_bus* bus = nullptr;
-  if (address.empty()) {
-    const int result = sd_bus_open_system(&bus);
-    opened.reset(bus);
-    return result;
-  }
-  if (const int result = sd_bus_new(&bus); result < 0) return result;
-  opened.reset(bus);
-  return startAt(bus, address);
 }
 
 }  // namespace
@@ -36,8 +34,10 @@ void BusMessageReleaser::operator()(sd_bus_message* message) const { sd_bus_mess
 void BusSlotReleaser::operator()(sd_bus_slot* slot) const { sd_bus_slot_unref(slot); }
 
 Bus openBus(const std::string& address, std::string& problem) {
-  Bus bus;
-  const int result = open(address, bus);
+  sd_bus* made = nullptr;
+  int result = sd_bus_new(&made);
+  Bus bus(made);
+  if (result >= 0) result = startAt(made, address.empty() ? systemBusAddress() : address);
   if (result >= 0) return bus;
   problem = std::generic_category().message(-result);
   return nullptr;

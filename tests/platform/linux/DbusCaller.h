@@ -51,9 +51,12 @@ class DbusCaller {
   static constexpr std::chrono::microseconds kTimeout = std::chrono::seconds(30);
 
   DbusCaller(const std::string& address, DbusNames names) : names_(std::move(names)) {
-    std::string problem;
-    bus_ = openBus(address, problem);
-    EXPECT_NE(bus_, nullptr) << problem;
+    sd_bus* bus = nullptr;
+    EXPECT_GE(sd_bus_new(&bus), 0);
+    bus_.reset(bus);
+    EXPECT_GE(sd_bus_set_address(bus, address.c_str()), 0);
+    EXPECT_GE(sd_bus_set_bus_client(bus, 1), 0);
+    EXPECT_GE(sd_bus_start(bus), 0);
   }
 
   sd_bus* bus() { return bus_.get(); }

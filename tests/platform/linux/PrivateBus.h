@@ -40,8 +40,10 @@ class PrivateBus {
   void start() {
     std::array<int, 2> ready{};
     EXPECT_EQ(pipe(ready.data()), 0);
+    const std::string configuration = "--config-file=" + directory_.path("bus.conf");
+    const std::string report = "--print-address=" + std::to_string(ready[1]);
     process_ = fork();
-    if (process_ == 0) become(ready[1]);
+    if (process_ == 0) become(configuration.c_str(), report.c_str());
     close(ready[1]);
     char byte = 0;
     isRunning_ = read(ready[0], &byte, 1) == 1;
@@ -59,11 +61,10 @@ class PrivateBus {
   void freeze() const { kill(process_, SIGSTOP); }
 
  private:
-  [[noreturn]] void become(int ready) const {
+  // In the child, between fork and exec: only what is safe there.
+  [[noreturn]] static void become(const char* configuration, const char* report) {
     prctl(PR_SET_PDEATHSIG, SIGKILL);
-    const std::string configuration = "--config-file=" + directory_.path("bus.conf");
-    const std::string report = "--print-address=" + std::to_string(ready);
-    execlp("dbus-daemon", "dbus-daemon", "--nofork", configuration.c_str(), report.c_str(), nullptr);
+    execlp("dbus-daemon", "dbus-daemon", "--nofork", configuration, report, nullptr);
     _exit(127);
   }
 
