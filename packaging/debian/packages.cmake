@@ -1,11 +1,7 @@
 # Debian packages, one a component: `cpack -G DEB` in a build directory whose prefix is /usr; scripts/package does it all.
 set(CPACK_GENERATOR DEB)
 set(CPACK_DEB_COMPONENT_INSTALL ON)
-set(CPACK_COMPONENTS_ALL daemon tools development)
-get_cmake_property(installed COMPONENTS)
-if("library" IN_LIST installed)
-  list(APPEND CPACK_COMPONENTS_ALL library)
-endif()
+set(CPACK_COMPONENTS_ALL daemon tools development library)
 
 set(CPACK_PACKAGE_NAME tonewerk-reporting)
 set(CPACK_PACKAGE_VERSION ${PROJECT_VERSION})
@@ -52,7 +48,7 @@ foreach(file IN LISTS preferences)
   string(APPEND conffiles "${file}\n")
 endforeach()
 file(CONFIGURE OUTPUT ${CMAKE_CURRENT_BINARY_DIR}/conffiles CONTENT "${conffiles}" @ONLY)
-# For the library that programs with signposts load.
+# For both libraries: the clients', and the one that programs with signposts load.
 file(CONFIGURE OUTPUT ${CMAKE_CURRENT_BINARY_DIR}/triggers CONTENT "activate-noawait ldconfig\n" @ONLY)
 
 set(CPACK_DEBIAN_LIBRARY_PACKAGE_NAME libtwreporting0)
@@ -60,6 +56,7 @@ set(CPACK_DEBIAN_LIBRARY_PACKAGE_SECTION libs)
 set(CPACK_COMPONENT_LIBRARY_DESCRIPTION "reports from audio programs, client library
 Programs describe with it what their audio is doing, from real-time threads,
 too, to the reporting daemon. Without a daemon it does nothing, cheaply.")
+set(CPACK_DEBIAN_LIBRARY_PACKAGE_CONTROL_EXTRA ${CMAKE_CURRENT_BINARY_DIR}/triggers)
 set(CPACK_DEBIAN_LIBRARY_PACKAGE_SUGGESTS "tonewerk-reporting-daemon")
 
 set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_NAME libtwreporting-dev)
@@ -67,9 +64,7 @@ set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_SECTION libdevel)
 set(CPACK_COMPONENT_DEVELOPMENT_DESCRIPTION "reports from audio programs, development files
 The headers of the reporting daemon's client library, in C and C++, what is
 needed to link it, and the header that marks intervals for performance traces.")
-if("library" IN_LIST installed)
-  set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_DEPENDS "libtwreporting0 ${same_version}")
-endif()
+set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_DEPENDS "libtwreporting0 ${same_version}")
 set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_SUGGESTS "tonewerk-reporting-daemon")
 
 set(CPACK_DEBIAN_TOOLS_PACKAGE_NAME tonewerk-reporting-tools)
@@ -78,6 +73,9 @@ set(CPACK_COMPONENT_TOOLS_DESCRIPTION "tools for the reporting daemon of an audi
 twctl queries what the reporting daemon has recorded, talks to it as its
 clients do, and replays recordings. tw-pipewire reports what a PipeWire graph
 plays.")
+# Made here, so that no package says yet who has the library.
+set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS_PRIVATE_DIRS ${PROJECT_BINARY_DIR}/src)
+set(CPACK_DEBIAN_TOOLS_PACKAGE_DEPENDS "libtwreporting0 ${same_version}")
 set(CPACK_DEBIAN_TOOLS_PACKAGE_RECOMMENDS "tonewerk-reporting-daemon")
 
 include(CPack)
