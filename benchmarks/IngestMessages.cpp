@@ -5,8 +5,8 @@
 #include <string_view>
 #include <vector>
 
-#include "client/ReportingClient.h"
 #include "platform/linux/RpcWriter.h"
+#include "support/client/ReportingClient.h"
 
 namespace tonewerk {
 namespace {

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "client/ReportingClient.h"
+#include "support/client/ReportingClient.h"
 
 #include <cstdlib>
 #include <gmock/gmock.h>

@@ -7,7 +7,6 @@
 #include <unistd.h>
 #include <vector>
 
-#include "client/ReportingClient.h"
 #include "platform/linux/DbusCaller.h"
 #include "platform/linux/DbusListener.h"
 #include "platform/linux/DbusValues.h"
@@ -17,6 +16,7 @@
 #include "support/MemoryLog.h"
 #include "support/MemoryMessaging.h"
 #include "support/TemporaryDirectory.h"
+#include "support/client/ReportingClient.h"
 
 namespace tonewerk {
 namespace {

@@ -7,8 +7,8 @@
 #include <string_view>
 #include <vector>
 
-#include "client/ReportingClient.h"
 #include "session/AudioEvent.h"
+#include "support/client/ReportingClient.h"
 #include "values/Value.h"
 
 namespace tonewerk {

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "client/ReportingClient.h"
+#include "support/client/ReportingClient.h"
 
 #include <algorithm>
 #include <cstdlib>
@@ -7,10 +7,10 @@
 #include <unordered_map>
 #include <utility>
 
-#include "client/RpcClientSocket.h"
 #include "platform/linux/Directories.h"
 #include "platform/linux/RpcLimits.h"
 #include "platform/linux/RpcWriter.h"
+#include "support/client/RpcClientSocket.h"
 
 namespace tonewerk {
 namespace {

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "client/RpcClientSocket.h"
+#include "support/client/RpcClientSocket.h"
 
 #include <algorithm>
 #include <array>
