@@ -94,8 +94,8 @@ ReplyError messagingError(std::int64_t code, std::string message) {
 
 std::optional<ReplyError> problemWithCaller(const Method& method, std::uint32_t user, std::uint32_t owner) {
   if (!method.forOwner || user == kRoot || (user == owner && user != kNoUser)) return std::nullopt;
-  return messagingError(kNotPermitted,
-                        std::string(method.name) + " is only for the user that the daemon runs as, and root");
+  return messagingError(kNotPermitted, "not permitted: " + std::string(method.name) +
+                                           " is for the user that the daemon runs as, and root");
 }
 
 }  // namespace tonewerk

@@ -134,7 +134,7 @@ TEST(ExportedInterfaceTest, WhatIsForTheOwnerIsForTheDaemonsUserAndRoot) {
   EXPECT_EQ(problemWithCaller(method, kOwner, kOwner), std::nullopt);
   EXPECT_EQ(problemWithCaller(method, 0, kOwner), std::nullopt);
   const ReplyError refusal{std::string(kMessagingErrorDomain), kNotPermitted,
-                           "watch is only for the user that the daemon runs as, and root"};
+                           "not permitted: watch is for the user that the daemon runs as, and root"};
   EXPECT_EQ(problemWithCaller(method, 501, kOwner), refusal);
   EXPECT_EQ(problemWithCaller(method, 501, 0), refusal);
 }

@@ -73,8 +73,8 @@ TEST_F(WatchExportTest, IsForTheDaemonsOwnUserAndRoot) {
     const auto other = messaging.connect(12, kOther);
     const auto refusal = refusalOf(*other, method, arguments);
     ASSERT_TRUE(refusal);
-    EXPECT_EQ(*refusal,
-              messagingError(4, method + " is only for the user that the daemon runs as, and root"));
+    EXPECT_EQ(*refusal, messagingError(4, "not permitted: " + method +
+                                              " is for the user that the daemon runs as, and root"));
   }
   const auto root = messaging.connect(13, 0);
   open(*root);

@@ -11,7 +11,6 @@
 #include <string>
 #include <sys/resource.h>
 #include <sys/stat.h>
-#include <sys/syscall.h>
 #include <thread>
 #include <unistd.h>
 #include <vector>
@@ -23,6 +22,7 @@
 #include "platform/linux/RpcWriter.h"
 #include "platform/linux/SystemClock.h"
 #include "support/MemoryLog.h"
+#include "support/Stranger.h"
 #include "support/TemporaryDirectory.h"
 
 namespace tonewerk {
@@ -206,8 +206,6 @@ TEST_F(UnixSocketListenerTest, PrefersTheUnknownMethodToItsArguments) {
 // one thread; anybody else is made a stranger to the daemon instead, and needs no connection of another user.
 class StrangerTest : public UnixSocketListenerTest {
  protected:
-  static constexpr std::uint32_t kStranger = 65'534;
-
   void SetUp() override {
     if (::geteuid() != 0) {
       listener = nullptr;  // lets go of the path
@@ -224,12 +222,7 @@ class StrangerTest : public UnixSocketListenerTest {
     EXPECT_EQ(::chmod(directory.path().c_str(), 0711), 0);
     EXPECT_EQ(::chmod(path.c_str(), 0666), 0);
     std::unique_ptr<RawClient> client;
-    std::thread stranger([&] {
-      // The system call itself changes this thread alone; the library's function would change them all.
-      EXPECT_EQ(::syscall(SYS_setresuid, -1, kStranger, -1), 0);
-      client = std::make_unique<RawClient>(path);
-    });
-    stranger.join();
+    runAsStranger([&] { client = std::make_unique<RawClient>(path); });
     return client;
   }
 };
@@ -243,7 +236,7 @@ TEST_F(StrangerTest, IsRefusedWhatIsForTheOwnerAndServedAllElse) {
   const ValueMap expected{
       {"domain", kMessagingErrorDomain},
       {"code", 4},
-      {"message", "takeFromOwner is only for the user that the daemon runs as, and root"}};
+      {"message", "not permitted: takeFromOwner is for the user that the daemon runs as, and root"}};
   EXPECT_EQ(*response->error->asMap(), expected) << response->error->text();
   EXPECT_THAT(record.requests(), IsEmpty());
   expectServed(*client);
