@@ -70,8 +70,9 @@ class CommandLineTest : public testing::Test {
 };
 
 TEST_F(CommandLineTest, HelpsWithEveryCommand) {
-  for (const char* name : {"list", "validate", "send", "replay", "events", "metrics", "power", "rtc",
-                           "defaults", "notify", "captures", "drafts", "whirlcaps", "channels", "kill"}) {
+  for (const char* name :
+       {"list", "validate", "send", "replay", "top", "tail", "events", "metrics", "power", "rtc", "defaults",
+        "notify", "captures", "drafts", "whirlcaps", "channels", "kill"}) {
     EXPECT_EQ(run({name, "--help"}), kDone);
     EXPECT_THAT(output(), HasSubstr("--json")) << name;
     EXPECT_THAT(errors(), IsEmpty());

@@ -29,6 +29,8 @@ int runCommandLine(int argc, const char* const* argv, Tool& tool) {
   addValidateCommand(app, tool);
   addSendCommand(app, tool);
   addReplayCommand(app, tool);
+  addTopCommand(app, tool);
+  addTailCommand(app, tool);
   addEventsCommand(app, tool);
   addMetricsCommand(app, tool);
   addPowerCommand(app, tool);

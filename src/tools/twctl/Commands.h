@@ -17,6 +17,8 @@ void addListCommand(CLI::App& app, Tool& tool);
 void addValidateCommand(CLI::App& app, Tool& tool);
 void addSendCommand(CLI::App& app, Tool& tool);
 void addReplayCommand(CLI::App& app, Tool& tool);
+void addTopCommand(CLI::App& app, Tool& tool);
+void addTailCommand(CLI::App& app, Tool& tool);
 void addEventsCommand(CLI::App& app, Tool& tool);
 void addMetricsCommand(CLI::App& app, Tool& tool);
 void addPowerCommand(CLI::App& app, Tool& tool);

@@ -2,6 +2,7 @@
 #include "tools/twctl/Daemon.h"
 
 #include <chrono>
+#include <memory>
 #include <string>
 #include <system_error>
 #include <vector>
@@ -10,6 +11,11 @@ namespace tonewerk {
 namespace {
 
 constexpr std::chrono::seconds kAnswerTimeout{10};
+
+// Whether nothing was sent, because no frame can carry it.
+bool isTooLarge(const std::error_code& error) {
+  return error == std::errc::message_size || error == std::errc::invalid_argument;
+}
 
 }  // namespace
 
@@ -27,9 +33,7 @@ bool Daemon::call(std::string_view method, const Arguments& arguments, std::opti
   std::error_code error;
   const std::optional<Answer> answer = client_.call(method, arguments, kAnswerTimeout, error);
   if (!answer) {
-    // The client refuses what no frame can carry before anything is sent.
-    const bool tooLarge = error == std::errc::message_size || error == std::errc::invalid_argument;
-    const ExitStatus status = tooLarge ? kRefused : kNoDaemon;
+    const ExitStatus status = isTooLarge(error) ? kRefused : kNoDaemon;
     tool_.status = tool_.fail(status, std::string(method) + ": " + error.message());
     return false;
   }
@@ -39,6 +43,29 @@ bool Daemon::call(std::string_view method, const Arguments& arguments, std::opti
   }
   result = answer->result;
   return true;
+}
+
+std::optional<Value> Daemon::await(std::string_view method, const Arguments& arguments,
+                                   const std::function<bool(int descriptor)>& waitReadable,
+                                   std::optional<DaemonFailure>& failure) {
+  // Shared, because who gives up leaves the handler behind.
+  const auto answer = std::make_shared<std::optional<Answer>>();
+  std::error_code error =
+      client_.request(method, arguments, [answer](const Answer& given) { *answer = given; });
+  while (!error && !*answer) {
+    if (!waitReadable(client_.fileDescriptor())) return std::nullopt;
+    error = client_.processAnswers(std::chrono::milliseconds::zero());
+  }
+  if (isTooLarge(error)) {
+    failure = {kRefused, std::string(method) + ": " + error.message()};
+  } else if (error) {
+    failure = {kNoDaemon, "the daemon has gone (" + error.message() + ")"};
+  } else if ((*answer)->error) {
+    failure = {kRefused, describe(method, *(*answer)->error)};
+  } else {
+    return (*answer)->result;
+  }
+  return std::nullopt;
 }
 
 std::string Daemon::describe(std::string_view method, const ReplyError& error) {

@@ -1,13 +1,21 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <functional>
 #include <optional>
+#include <string>
 #include <string_view>
 
 #include "tools/twctl/DaemonConnection.h"
 #include "tools/twctl/Tool.h"
 
 namespace tonewerk {
+
+// Why there is no result, and how the tool ends then.
+struct DaemonFailure {
+  ExitStatus status;
+  std::string problem;
+};
 
 // A command's connection to the daemon. What goes wrong is printed and becomes the tool's exit status.
 class Daemon {
@@ -22,6 +30,12 @@ class Daemon {
 
   // The answer's result (none for nil) in `result`. False when the request was refused or not answered.
   bool call(std::string_view method, const Arguments& arguments, std::optional<Value>& result);
+
+  // The same for an answer that may be long in coming, with nothing printed: `waitReadable` waits until the
+  // descriptor is readable, or says false to give up. None, then or with a `failure`.
+  std::optional<Value> await(std::string_view method, const Arguments& arguments,
+                             const std::function<bool(int descriptor)>& waitReadable,
+                             std::optional<DaemonFailure>& failure);
 
   DaemonConnection& client() { return client_; }
 

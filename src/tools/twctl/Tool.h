@@ -28,7 +28,9 @@ struct Tool {
   bool asJson = false;      // --json
   bool systemWide = false;  // --system
   bool outIsTerminal = false;
-  int status = kDone;  // of the command that ran
+  int inDescriptor = -1;   // where keys come from; -1 for nowhere
+  int outDescriptor = -1;  // of `out`; -1 when it is no file
+  int status = kDone;      // of the command that ran
 
   // Prints "twctl: <problem>" and returns `failure`.
   int fail(ExitStatus failure, std::string_view problem) const;

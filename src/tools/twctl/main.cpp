@@ -9,5 +9,7 @@ int main(int argc, char** argv) {
   const tonewerk::NlohmannJsonService json;
   tonewerk::Tool tool{std::cout, std::cerr, json};
   tool.outIsTerminal = isatty(STDOUT_FILENO) != 0;
+  tool.outDescriptor = STDOUT_FILENO;
+  if (isatty(STDIN_FILENO) != 0) tool.inDescriptor = STDIN_FILENO;
   return tonewerk::runCommandLine(argc, argv, tool);
 }

@@ -75,17 +75,17 @@ std::vector<char*> pointersTo(std::vector<std::string>& texts) {
 }
 
 bool redirect(const std::string& path, int descriptor) {
-  const int file = open(path.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0644);
+  const int file = open(path.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_NOCTTY | O_CLOEXEC, 0644);
   return file >= 0 && dup2(file, descriptor) >= 0;
 }
 
 // In the child, between fork and exec: only what is safe there.
-[[noreturn]] void become(char* const* arguments, char* const* environment, const std::string& outputPath,
-                         const std::string& errorPath, pid_t parent) {
+[[noreturn]] void become(char* const* arguments, char* const* environment, const std::string& inputPath,
+                         const std::string& outputPath, const std::string& errorPath, pid_t parent) {
   setpgid(0, 0);
   prctl(PR_SET_PDEATHSIG, SIGKILL);
-  const int null = open("/dev/null", O_RDONLY);
-  const bool isReady = getppid() == parent && null >= 0 && dup2(null, STDIN_FILENO) >= 0 &&
+  const int input = open(inputPath.c_str(), O_RDONLY | O_NOCTTY);
+  const bool isReady = getppid() == parent && input >= 0 && dup2(input, STDIN_FILENO) >= 0 &&
                        redirect(outputPath, STDOUT_FILENO) && redirect(errorPath, STDERR_FILENO);
   if (isReady) execvpe(arguments[0], arguments, environment);
   _exit(127);
@@ -117,7 +117,7 @@ bool ChildProcess::start(const ChildCommand& command, const std::string& outputP
   status_.reset();
   identifier_ = fork();
   if (identifier_ == 0)
-    become(argumentPointers.data(), environmentPointers.data(), outputPath, errorPath, parent);
+    become(argumentPointers.data(), environmentPointers.data(), command.input, outputPath, errorPath, parent);
   if (identifier_ < 0) {
     ADD_FAILURE() << "cannot start " << command.program << ": " << std::strerror(errno);
     return false;

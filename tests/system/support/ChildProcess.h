@@ -23,6 +23,7 @@ struct ChildCommand {
   std::string program;  // looked for in PATH when it has no slash
   std::vector<std::string> arguments;
   std::map<std::string, std::string> environment;
+  std::string input = "/dev/null";
 };
 
 // A process of a test. Dies with the test, however that ends: it is killed when the object is destroyed, with
