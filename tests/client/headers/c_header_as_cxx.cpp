@@ -1,2 +1,2 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "c_header.c"
+#include "c_header.c"  // NOLINT(bugprone-suspicious-include): that is what is tested
