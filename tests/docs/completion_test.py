@@ -15,6 +15,7 @@ DRIVER = """
 set -euo pipefail
 compopt() { :; } # which works inside readline only
 source "$1"
+_twctl_patience=30s # a busy machine is no reason to fail
 shift
 COMP_WORDS=("$@")
 COMP_CWORD=$(($# - 1))
