@@ -15,11 +15,13 @@ endif()
 # One object, so that it can keep its names to itself as the shared library does. Groups that other objects of a program
 # may hold, too (inlined functions), become plain sections first: one that was thrown out for another's would leave
 # nothing behind for names that are local.
+# That option is GNU ld's alone, while CMake's own choice beside clang is another linker where there is one.
+find_program(TWREPORTING_LD NAMES ld.bfd ld REQUIRED)
 set(twreporting_archive ${CMAKE_CURRENT_BINARY_DIR}/libtwreporting.a)
 set(twreporting_object ${CMAKE_CURRENT_BINARY_DIR}/twreporting.o)
 add_custom_command(
   OUTPUT ${twreporting_archive}
-  COMMAND ${CMAKE_LINKER} -r --force-group-allocation -o ${twreporting_object}
+  COMMAND ${TWREPORTING_LD} -r --force-group-allocation -o ${twreporting_object}
     $<TARGET_OBJECTS:tonewerk_reporting_objects>
   COMMAND ${CMAKE_OBJCOPY} --wildcard --keep-global-symbol=twr_* ${twreporting_object}
   COMMAND ${CMAKE_COMMAND} -E rm -f ${twreporting_archive}
