@@ -34,8 +34,7 @@ class RandomFrames {
 
   // Mostly a request or notification with arguments that suit, now and then something else.
   std::string next() {
-    const std::vector<Method>& methods = TWReportingServiceExport::exportedInterface().methods;
-    const Method& method = methods[below(methods.size() - 1)];  // all but the last, which ends the daemon
+    const Method& method = anyMethod();
     std::vector<std::string> params;
     for (const Parameter& parameter : method.parameters) {
       params.push_back(isOneOutOf(10) ? anything(4) : suiting(parameter.type));
@@ -50,6 +49,15 @@ class RandomFrames {
   }
 
  private:
+  // All but the one that ends the daemon.
+  const Method& anyMethod() {
+    const std::vector<Method>& methods = TWReportingServiceExport::exportedInterface().methods;
+    for (;;) {
+      const Method& method = methods[below(methods.size())];
+      if (method.result.type != ResultType::kNever) return method;
+    }
+  }
+
   // Few sessions, so that they are created, started, stopped and destroyed in every order.
   std::string reporterID() { return packed::integer(static_cast<std::int64_t>(below(6))); }
 
