@@ -73,7 +73,7 @@ TEST(TopFrameTest, SaysHowManyMoreThereAre) {
 }
 
 TEST(TopFrameTest, FitsIntoTheSmallestWindow) {
-  for (const std::size_t height : {1, 2, 3}) {
+  for (const std::size_t height : {1U, 2U, 3U}) {
     const auto lines = topFrame(rows(5), TerminalSize{10, height});
     EXPECT_LE(lines.size(), height);
     EXPECT_EQ(lines.front(), "5 sessions");
