@@ -35,8 +35,7 @@ DbusConnection::DbusConnection(const DbusConnectionContext& context, std::uint64
 DbusConnection::~DbusConnection() { outbox_->close(); }
 
 std::string DbusConnection::description() const {
-  const std::string user =
-      peer_.userIdentifier == kNoUser ? "unknown" : std::to_string(peer_.userIdentifier);
+  const std::string user = peer_.userIdentifier == kNoUser ? "unknown" : std::to_string(peer_.userIdentifier);
   return "connection " + std::to_string(identifier_) + " of process " +
          std::to_string(peer_.processIdentifier) + ", user " + user + ", on D-Bus as " + name_;
 }
