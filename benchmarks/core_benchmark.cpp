@@ -20,6 +20,8 @@
 #include "platform/Metricon.h"
 #include "platform/SerialQueue.h"
 #include "platform/TracePoints.h"
+#include "service/MessageWatch.h"
+#include "service/MessageWatcher.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionMessage.h"
@@ -259,6 +261,26 @@ void SendToSessions(benchmark::State& state) {
   }
 }
 BENCHMARK(SendToSessions)->ArgName("sessions")->Arg(1)->Arg(1000);
+
+// What showing a received message to so many watchers adds; those that do not ask are full before long, and
+// each message then pushes one out.
+void NoteForWatchers(benchmark::State& state) {
+  Core core;
+  const auto session = core.makeSession(77);
+  MessageWatch watch;
+  std::vector<std::shared_ptr<MessageWatcher>> watchers;
+  for (std::int64_t at = 0; at < state.range(0); ++at) {
+    watchers.push_back(std::make_shared<MessageWatcher>());
+    watchers.back()->open({});
+    watch.add(watchers.back());
+  }
+  const Record record = Messages(8, true).records(1).front();
+  for (auto _ : state) watch.note(*session, *record);
+  for (const auto& watcher : watchers) {
+    if (watcher->waitingMessages() == 0) state.SkipWithError("a watcher got no message");
+  }
+}
+BENCHMARK(NoteForWatchers)->ArgName("watchers")->Arg(0)->Arg(1)->Arg(10);
 
 // The stop of a session that stores so many messages: sorting them, and every worker's report. Per stop.
 void Stop(benchmark::State& state) {
