@@ -11,7 +11,8 @@ namespace tonewerk {
 // Where sessions go: the reporting daemon.
 //
 // Nothing fails and nothing waits. Before the daemon is there everything is swallowed, and its users are then
-// told to begin their sessions; when it has been away, they are told to say how things stand (see DaemonLink).
+// told to begin their sessions; when it has been away, they are told to say how things stand (see
+// DaemonLink).
 class SessionSink {
  public:
   virtual ~SessionSink() = default;
