@@ -287,7 +287,8 @@ void ClientEngine::receive(Lock& lock) {
     lock.unlock();
     const ClientSocket::Transfer transfer = socket_.receive(bytes.data(), bytes.size());
     lock.lock();
-    if (transfer.error == EAGAIN) return;
+    isReadable_ = transfer.error != EAGAIN;
+    if (!isReadable_) return;
     if (transfer.error != 0) return connectionLost(transfer.error);
     if (transfer.isEnd) return connectionLost(ECONNRESET);
     if (!decode({bytes.data(), transfer.bytes})) return connectionLost(EBADMSG);

@@ -47,8 +47,7 @@ class ClientEngine {
     if (hasForked_.load(std::memory_order_relaxed)) return TWR_FORKED;
     const std::unique_lock lock(mutex_);
     if (state_ == TWR_STATE_ENDED) return TWR_NOT_CONNECTED;
-    const twr_status status = ask(outbox_);
-    return goOn() ? status : TWR_NO_MEMORY;
+    return goOn() ? ask(outbox_) : TWR_NO_MEMORY;
   }
   // The same for what must be done whether the client has ended or not, or has forked away.
   template <class Do>

@@ -99,7 +99,6 @@ twr_status ClientOutbox::send(twr_session* session, RingMessage message,
     command.session = session->shared_from_this();
     message.dropped = std::exchange(session->dropped, 0);
   }
-  command.dropped = message.dropped;
   command.body = messageBody(message, reporterIDs);
   command.reply = reply;
   add(std::move(command));
@@ -418,7 +417,6 @@ void ClientOutbox::appendFromRing(twr_session& session, RingMessage message) {
   OutgoingFrame frame;
   frame.origin = OutgoingFrame::Origin::kRing;
   frame.command.session = session.shared_from_this();
-  frame.command.dropped = message.dropped;
   batch_.add(std::move(frame));
   ++ringMessages_;
 }
@@ -475,7 +473,6 @@ void ClientOutbox::absorbMessage(twr_session& session, RingMessage message, Comm
     return;
   }
   message.dropped += std::exchange(session.dropped, 0);
-  command.dropped = message.dropped;
   command.body = messageBody(message, {&session.identifier, 1});
   command.session = session.shared_from_this();
   session.lastReconciliation = nullptr;

@@ -51,7 +51,6 @@ struct Command {
   Kind kind = Kind::kMessage;
   std::shared_ptr<twr_session> session;  // null for the client's own
   std::string body;
-  std::uint64_t dropped = 0;  // what a message says; it is said again should this one be dropped
   PendingReply reply;
   std::vector<RingMark> marks;
   std::unique_ptr<SessionChange> change;

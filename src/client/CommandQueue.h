@@ -20,6 +20,7 @@ class CommandQueue {
 
   explicit CommandQueue(std::size_t mostBytes) : mostBytes_(mostBytes) {}
 
+  // What alone is larger than the bound finds room where there is nothing else.
   bool hasRoomForMessage(std::size_t bytes) const;
   bool hasRoomForChange(std::size_t bytes) const;
 

@@ -156,23 +156,23 @@ twr_client* twr_client_create(const twr_client_options* options) {
   return guarded<twr_client*>(nullptr, [&] { return makeClient(settingsOf(options)); });
 }
 
-void twr_client_destroy(twr_client* client, int timeout_ms) {
+void twr_client_destroy(twr_client* client, int timeoutMs) {
   if (client == nullptr) return;
   const bool hasForked = client->engine.hasForked();
   if (!hasForked && clientRegistry::isClientThread()) return;
-  if (!hasForked) client->engine.end(milliseconds(timeout_ms));
+  if (!hasForked) client->engine.end(milliseconds(timeoutMs));
   clientRegistry::remove(client->engine);
   delete client;
 }
 
-twr_status twr_client_connect(twr_client* client, int timeout_ms) {
+twr_status twr_client_connect(twr_client* client, int timeoutMs) {
   if (client == nullptr) return TWR_INVALID;
-  return guarded([&] { return client->engine.connect(milliseconds(timeout_ms)); });
+  return guarded([&] { return client->engine.connect(milliseconds(timeoutMs)); });
 }
 
-twr_status twr_client_flush(twr_client* client, int timeout_ms) {
+twr_status twr_client_flush(twr_client* client, int timeoutMs) {
   if (client == nullptr) return TWR_INVALID;
-  return guarded([&] { return client->engine.flush(milliseconds(timeout_ms)); });
+  return guarded([&] { return client->engine.flush(milliseconds(timeoutMs)); });
 }
 
 twr_status twr_client_get_info(const twr_client* client, twr_client_info* info) {
@@ -185,25 +185,25 @@ twr_status twr_client_get_info(const twr_client* client, twr_client_info* info) 
 }
 
 twr_status twr_client_send(twr_client* client, uint32_t category, uint16_t type, const twr_payload* payload,
-                           const int64_t* reporter_ids, size_t count, twr_reply reply, void* context) {
-  if (client == nullptr || (reporter_ids == nullptr && count > 0)) return TWR_INVALID;
+                           const int64_t* reporterIDs, size_t count, twr_reply reply, void* context) {
+  if (client == nullptr || (reporterIDs == nullptr && count > 0)) return TWR_INVALID;
   if (const twr_status problem = problemOfMessage(payload, count); problem != TWR_OK) return problem;
   return guarded([&] {
     return client->engine.request([&](ClientOutbox& outbox) {
-      return outbox.send(nullptr, messageOf(category, type, *payload), {reporter_ids, count},
+      return outbox.send(nullptr, messageOf(category, type, *payload), {reporterIDs, count},
                          {reply, context});
     });
   });
 }
 
-twr_status twr_client_get_service_type(twr_client* client, int64_t reporter_id, twr_reply reply,
+twr_status twr_client_get_service_type(twr_client* client, int64_t reporterID, twr_reply reply,
                                        void* context) {
-  return ask(client, "getServiceNameForReporterID", {Value(reporter_id)},
+  return ask(client, "getServiceNameForReporterID", {Value(reporterID)},
              {reply, context, AnswerKind::kServiceType});
 }
 
-twr_status twr_client_validate(twr_client* client, int64_t reporter_id, twr_reply reply, void* context) {
-  return ask(client, "reporterIDValid", {Value(reporter_id)}, {reply, context, AnswerKind::kValidity});
+twr_status twr_client_validate(twr_client* client, int64_t reporterID, twr_reply reply, void* context) {
+  return ask(client, "reporterIDValid", {Value(reporterID)}, {reply, context, AnswerKind::kValidity});
 }
 
 twr_status twr_client_get_all_reporters(twr_client* client, twr_reply reply, void* context) {
@@ -234,9 +234,9 @@ twr_status twr_client_request(twr_client* client, const char* method, const twr_
 
 // ---- sessions ----
 
-twr_session* twr_session_create(twr_client* client, int64_t reporter_id) {
+twr_session* twr_session_create(twr_client* client, int64_t reporterID) {
   if (client == nullptr || client->engine.hasForked()) return nullptr;
-  const std::int64_t identifier = reporter_id == TWR_NEW_ID ? randomIdentifier() : reporter_id;
+  const std::int64_t identifier = reporterID == TWR_NEW_ID ? randomIdentifier() : reporterID;
   return guarded<twr_session*>(nullptr, [&] {
     return client->engine.withOutbox(
         [&](ClientOutbox& outbox) { return outbox.addSession(client->engine, identifier).get(); });
@@ -245,9 +245,9 @@ twr_session* twr_session_create(twr_client* client, int64_t reporter_id) {
 
 int64_t twr_session_id(const twr_session* session) { return session == nullptr ? 0 : session->identifier; }
 
-twr_status twr_session_set_service_type(twr_session* session, uint16_t service_type, twr_reply reply,
+twr_status twr_session_set_service_type(twr_session* session, uint16_t serviceType, twr_reply reply,
                                         void* context) {
-  return change(session, {Kind::kServiceType, service_type, {}}, {reply, context});
+  return change(session, {Kind::kServiceType, serviceType, {}}, {reply, context});
 }
 
 twr_status twr_session_set_configuration(twr_session* session, const twr_payload* configuration,
@@ -295,9 +295,9 @@ twr_status twr_session_destroy(twr_session* session, twr_reply reply, void* cont
 
 // ---- senders ----
 
-twr_sender* twr_sender_open(twr_session* session, size_t ring_bytes) {
+twr_sender* twr_sender_open(twr_session* session, size_t ringBytes) {
   if (session == nullptr || session->engine.hasForked()) return nullptr;
-  const std::size_t bytes = ring_bytes == 0 ? std::size_t{TWR_DEFAULT_RING_BYTES} : ring_bytes;
+  const std::size_t bytes = ringBytes == 0 ? std::size_t{TWR_DEFAULT_RING_BYTES} : ringBytes;
   if (bytes > TWR_MOST_RING_BYTES) return nullptr;
   return guarded<twr_sender*>(nullptr, [&] {
     return session->engine.withOutbox([&](ClientOutbox& outbox) {

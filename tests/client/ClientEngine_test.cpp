@@ -5,6 +5,8 @@
 #include <array>
 #include <cerrno>
 #include <csignal>
+#include <cstdlib>
+#include <fcntl.h>
 #include <filesystem>
 #include <fstream>
 #include <gmock/gmock.h>
@@ -341,6 +343,52 @@ TEST_F(ClientEngineTest, IsDestroyedAtOnceWithoutADaemon) {
 }
 
 TEST_F(ClientEngineTest, IsDestroyedWithoutHavingBeenUsed) { destroyClient(1'000'000); }
+
+TEST_F(ClientEngineTest, CarriesAMessageThatIsLargerThanItsQueue) {
+  const auto connection = connectWithSession();
+  ASSERT_EQ(twr_client_flush(client, kScriptPatienceMs), TWR_OK);
+  TestPayload payload(1024 * 1024);
+  const std::string text(ClientSettings::kDefaultQueueBytes * 2, 'x');
+  ASSERT_EQ(twr_put_text(payload.get(), "text", text.c_str()), TWR_OK);
+  EXPECT_EQ(twr_session_send(session, 1, 1, payload.get(), nullptr, nullptr), TWR_OK);
+  EXPECT_EQ(connection->nextMap().text("text"), text);
+}
+
+// Were the delay not reset, the last of these would come after minutes.
+TEST_F(ClientEngineTest, ComesBackSoonToADaemonThatAnswers) {
+  ClientSettings chosen = settings(path);
+  chosen.mostDelay = milliseconds(1'000'000);
+  makeClientWith(chosen);
+  for (int at = 0; at < 20; ++at) {
+    ASSERT_EQ(twr_client_get_all_reporters(client, AnswerLog::note, log.as("all")), TWR_OK);
+    const auto connection = daemon->accept();
+    connection->answer(connection->next().identifier, Value(ValueArray()));
+    EXPECT_EQ(log.next(), "all: done");
+  }
+}
+
+TEST_F(ClientEngineTest, LeavesNoDescriptorToProgramsThatAreExecuted) {
+  const auto connection = connectWithSession();
+  int found = 0;
+  for (const auto& entry : std::filesystem::directory_iterator("/proc/self/fd")) {
+    const int descriptor = std::stoi(entry.path().filename());
+    std::error_code error;
+    const std::string target = std::filesystem::read_symlink(entry.path(), error);
+    if (!target.starts_with("socket:") && target != "anon_inode:[eventfd]") continue;
+    EXPECT_NE(::fcntl(descriptor, F_GETFD) & FD_CLOEXEC, 0) << target;
+    ++found;
+  }
+  EXPECT_GE(found, 4);  // the daemon's two, the client's two
+}
+
+TEST_F(ClientEngineTest, ReadsTheEnvironmentOnceWhenItIsCreated) {
+  ::setenv("TONEWERK_REPORTING_SOCKET", path.c_str(), 1);
+  twr_client* other = twr_client_create(nullptr);
+  ::setenv("TONEWERK_REPORTING_SOCKET", "/nowhere", 1);
+  EXPECT_EQ(twr_client_connect(other, kScriptPatienceMs), TWR_OK);
+  ::unsetenv("TONEWERK_REPORTING_SOCKET");
+  twr_client_destroy(other, 0);
+}
 
 TEST_F(ClientEngineTest, RaisesNoSignalWhenTheDaemonIsGone) {
   auto connection = connectWithSession();
