@@ -1,11 +1,29 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "client/SessionState.h"
 
+#include <string_view>
+#include <utility>
+
 #include "client/RequestBody.h"
 
 namespace tonewerk {
 
 using Kind = SessionChange::Kind;
+
+namespace {
+
+// The daemon takes the second for the first where a configuration brings it alone. Told again, merged with
+// what came before, the first would win.
+constexpr std::string_view kApplicationName = "HostApplicationDisplayID";
+constexpr std::string_view kOtherApplicationName = "QMHostApplicationDisplayID";
+
+void merge(ValueMap& configuration, const ValueMap& update) {
+  const Value* name = update.find(kOtherApplicationName);
+  if (name != nullptr) configuration.set(SharedString(kApplicationName), *name);
+  configuration.merge(update);
+}
+
+}  // namespace
 
 void SessionState::apply(const SessionChange& change) {
   switch (change.kind) {
@@ -18,7 +36,7 @@ void SessionState::apply(const SessionChange& change) {
       serviceType = change.serviceType;
       return;
     case Kind::kConfiguration:
-      configuration.merge(change.configuration);
+      merge(configuration, change.configuration);
       return;
     case Kind::kStart:
       isStarted = true;

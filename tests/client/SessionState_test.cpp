@@ -39,6 +39,17 @@ TEST(SessionStateTest, MergesConfigurations) {
   EXPECT_EQ(state.configuration, (ValueMap{{"a", 1}, {"b", 2}}));
 }
 
+TEST(SessionStateTest, TakesTheApplicationsOtherNameAsTheDaemonDoes) {
+  SessionState state{true, 7, {{"HostApplicationDisplayID", "a"}}, true};
+  state.apply({Kind::kConfiguration, 0, {{"QMHostApplicationDisplayID", "b"}}});
+  EXPECT_EQ(state.configuration.text("HostApplicationDisplayID"), "b");
+  state.apply({Kind::kConfiguration, 0, {{"HostApplicationDisplayID", "c"}}});
+  EXPECT_EQ(state.configuration.text("HostApplicationDisplayID"), "c");
+  state.apply(
+      {Kind::kConfiguration, 0, {{"QMHostApplicationDisplayID", "d"}, {"HostApplicationDisplayID", "e"}}});
+  EXPECT_EQ(state.configuration.text("HostApplicationDisplayID"), "e");
+}
+
 TEST(SessionStateTest, NeedsNothingToBecomeWhatItIs) {
   const SessionState state{true, 7, {{"a", 1}}, true};
   EXPECT_THAT(changesBetween(state, state), IsEmpty());
