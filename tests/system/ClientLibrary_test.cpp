@@ -6,9 +6,9 @@
 #include <functional>
 #include <mutex>
 #include <string>
+#include <utility>
 #include <vector>
 
-#include "client/ClientHandle.h"
 #include "client/TestPayload.h"
 #include "system/support/DaemonTest.h"
 #include "system/support/RecordedEvents.h"
@@ -65,11 +65,12 @@ class OneAnswer {
 class ClientLibraryTest : public DaemonTest {
  protected:
   ClientLibraryTest() {
-    ClientSettings settings;
-    settings.socketPaths = {daemon.socketPath()};
-    settings.queueBytes = 4096;
-    settings.firstDelay = settings.mostDelay = std::chrono::milliseconds(5);
-    client = makeClient(settings);
+    const std::string path = daemon.socketPath();
+    twr_client_options options{};
+    options.size = sizeof(options);
+    options.socket_path = path.c_str();
+    options.queue_bytes = 4096;
+    client = twr_client_create(&options);
   }
   ~ClientLibraryTest() override { twr_client_destroy(client, 0); }
 
