@@ -9,8 +9,8 @@
 
 namespace tr = tonewerk::reporting;
 
-static void play(
-    tr::Sender& sender) {  // a real-time thread: nothing here locks, allocates or calls the system
+// A real-time thread: nothing here locks, allocates or calls the system.
+static void play(tr::Sender& sender) {
   for (int cycle = 0; cycle < 4; ++cycle) {
     tr::Payload<128> payload;
     payload.put("cycle", cycle).put("load", 0.25 * cycle);
