@@ -188,8 +188,11 @@ TWR_API twr_client* twr_client_create(const twr_client_options* options);
 /*
  * Waits up to `timeout_ms` until what is queued has gone out and the daemon has closed its end, then drops
  * the rest; without a daemon it does not wait. The client's sessions and senders are destroyed with it; the
- * daemon stops and reports started ones. Nothing is called any more once it has returned. Inside a callback
- * it does nothing.
+ * daemon stops and reports started ones. Nothing is called any more once it has returned.
+ *
+ * Inside one of the client's own callbacks it does not wait but leaves that to the background thread: pending
+ * replies are still called, state_changed is not. The memory is freed by a later twr_client_create() or
+ * twr_client_destroy().
  */
 TWR_API void twr_client_destroy(twr_client* client, int timeout_ms);
 
@@ -289,8 +292,9 @@ TWR_API twr_status twr_session_destroy(twr_session* session, twr_reply reply, vo
 
 /*
  * For one thread at a time, such as an audio callback. Messages lie in a ring of fixed size until the
- * background thread takes them, some ten milliseconds later; relative to the session's other calls they keep
- * their order. The ring's memory is touched when the sender is opened, and never again allocated.
+ * background thread takes them: 10 ms later while messages come, up to 100 ms later after a pause. Relative
+ * to the session's other calls they keep their order. The ring's memory is touched when the sender is opened,
+ * and never again allocated.
  */
 typedef struct twr_sender twr_sender;
 

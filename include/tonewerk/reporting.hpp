@@ -20,8 +20,8 @@
 // sender its session, so the order in which they go does not matter.
 //
 // Nothing here throws; the program ends where it has no memory for what this header itself keeps. A reply
-// runs on the client's background thread. It may do there what twr_reply may, so it must not drop the
-// client's last share, which waits; an exception that leaves it ends the program.
+// runs on the client's background thread. It may do there what twr_reply may, and it may drop the client's
+// last share; an exception that leaves it ends the program.
 
 #include <chrono>
 #include <cstddef>
@@ -174,6 +174,8 @@ class AnyPayload {
       ::twr_put_date(&payload_, name, value.seconds);
     } else if constexpr (std::is_same_v<Held, std::chrono::system_clock::time_point>) {
       ::twr_put_date(&payload_, name, std::chrono::duration<double>(value.time_since_epoch()).count());
+    } else if constexpr (std::is_same_v<Held, const char*> || std::is_same_v<Held, char*>) {
+      ::twr_put_text(&payload_, name, value);
     } else {
       static_assert(std::is_convertible_v<const T&, std::string_view>, "a payload cannot hold this type");
       const std::string_view text = value;

@@ -56,7 +56,7 @@ void ClientEngine::wake() {
 }
 
 twr_status ClientEngine::connect(milliseconds timeout) {
-  if (clientRegistry::isClientThread()) return TWR_WOULD_WAIT;
+  if (ClientThread::isCurrent()) return TWR_WOULD_WAIT;
   if (hasForked_) return TWR_FORKED;
   Lock lock(mutex_);
   if (state_ == TWR_STATE_CONNECTED) return TWR_OK;
@@ -67,7 +67,7 @@ twr_status ClientEngine::connect(milliseconds timeout) {
 }
 
 twr_status ClientEngine::flush(milliseconds timeout) {
-  if (clientRegistry::isClientThread()) return TWR_WOULD_WAIT;
+  if (ClientThread::isCurrent()) return TWR_WOULD_WAIT;
   if (hasForked_) return TWR_FORKED;
   Lock lock(mutex_);
   if (outbox_.isEmpty()) return TWR_OK;
@@ -91,14 +91,36 @@ twr_status ClientEngine::await(Lock& lock, const std::shared_ptr<Waiter>& waiter
 }
 
 void ClientEngine::end(milliseconds timeout) {
-  {
-    const Lock lock(mutex_);
-    isEnding_ = true;
-    endBy_ = Clock::now() + std::max(timeout, milliseconds::zero());
-    nextAttempt_ = Clock::now();
-    wake();
-  }
+  Lock lock(mutex_);
+  beginToEnd(timeout);
+  joinThread(lock);
+}
+
+bool ClientEngine::endByItself(milliseconds timeout) {
+  const Lock lock(mutex_);
+  if (!thread_.isThisThread()) return false;
+  isOrphan_ = true;
+  beginToEnd(timeout);
+  return true;
+}
+
+void ClientEngine::beginToEnd(milliseconds timeout) {
+  isEnding_ = true;
+  endBy_ = Clock::now() + std::max(timeout, milliseconds::zero());
+  nextAttempt_ = Clock::now();
+  wake();
+}
+
+// The library's end may come while somebody destroys the client: one of the two joins, the other waits.
+void ClientEngine::joinThread(Lock& lock) {
+  if (!thread_.isRunning()) return;
+  if (isBeingJoined_) return joined_.wait(lock, [this] { return !thread_.isRunning(); });
+  isBeingJoined_ = true;
+  lock.unlock();
   thread_.join();
+  lock.lock();
+  thread_.forget();
+  joined_.notify_all();
 }
 
 twr_client_info ClientEngine::info() const {
@@ -120,6 +142,7 @@ twr_client_info ClientEngine::info() const {
 void ClientEngine::becomeForked() {
   hasForked_ = true;
   state_ = TWR_STATE_ENDED;
+  ClientThread::becomeForked();
   socket_.close();
   event_.close();
   thread_.forget();
@@ -130,9 +153,9 @@ bool ClientEngine::hasThread() const {
   return thread_.isRunning() && !thread_.isThisThread();
 }
 
-bool ClientEngine::isThisThread() const {
+bool ClientEngine::isDeadOrphan() const {
   const Lock lock(mutex_);
-  return thread_.isThisThread();
+  return isOrphan_ && hasFinished_;
 }
 
 void ClientEngine::abandon() {
@@ -165,6 +188,7 @@ void ClientEngine::run() {
     if (!isDone()) sleep(lock);
   }
   finish(lock);
+  hasFinished_ = !hasForked_;
 }
 
 void ClientEngine::work(Lock& lock) {
@@ -311,6 +335,7 @@ bool ClientEngine::deliver(Lock& lock) {
   const Deliveries deliveries = std::exchange(deliveries_, {});
   lock.unlock();
   for (const Delivery& delivery : deliveries) {
+    if (delivery.state && isOrphan_) continue;  // set on this thread, by what is called here
     if (delivery.state) {
       settings_.stateChanged(settings_.context, *delivery.state);
     } else {

@@ -3,6 +3,7 @@
 
 #include <atomic>
 #include <chrono>
+#include <condition_variable>
 #include <cstdint>
 #include <memory>
 #include <mutex>
@@ -63,21 +64,26 @@ class ClientEngine {
   twr_status flush(std::chrono::milliseconds timeout);
   // Sends what is queued, within the time, and ends the thread. Nothing is called after it has returned.
   void end(std::chrono::milliseconds timeout);
+  // The same inside one of this client's callbacks, where it cannot be waited for: answers still come, states
+  // do not, and the registry buries the client later. False, with nothing done, anywhere else.
+  bool endByItself(std::chrono::milliseconds timeout);
 
   twr_client_info info() const;
   const std::atomic<bool>& hasForked() const { return hasForked_; }
 
   // ---- for the registry ----
 
-  ClientEngine* nextClient = nullptr;  // under the registry's mutex
+  // Under the registry's mutex. The owner is what this is a part of, and holds itself until it is removed.
+  ClientEngine* nextClient = nullptr;
+  std::shared_ptr<void> owner;
   void beforeFork() { mutex_.lock(); }
   void afterFork() { mutex_.unlock(); }
   // In the child, between the two.
   void becomeForked();
   // One that may be joined from here.
   bool hasThread() const;
-  // Whether the caller is this client's thread, inside a callback.
-  bool isThisThread() const;
+  // Ended by itself, and nothing is left to be done but to join its thread.
+  bool isDeadOrphan() const;
   // Ends the thread at once; nobody is told.
   void abandon();
 
@@ -89,6 +95,8 @@ class ClientEngine {
   bool goOn();
   void wake();
   twr_status await(Lock& lock, const std::shared_ptr<Waiter>& waiter, std::chrono::milliseconds timeout);
+  void beginToEnd(std::chrono::milliseconds timeout);
+  void joinThread(Lock& lock);
 
   // The thread's, under the mutex but where they say so by taking the lock.
   static void runThread(void* self);
@@ -138,6 +146,10 @@ class ClientEngine {
 
   bool isEnding_ = false;
   bool isAbandoned_ = false;
+  bool isOrphan_ = false;
+  bool hasFinished_ = false;
+  bool isBeingJoined_ = false;
+  std::condition_variable joined_;
   bool isHopeless_ = false;  // ending, and nobody is there
   Clock::time_point endBy_;
 

@@ -15,7 +15,7 @@ struct twr_client {  // NOLINT(readability-identifier-naming)
 
 namespace tonewerk {
 
-// Null without memory.
+// It holds itself until it is destroyed. Null without memory.
 twr_client* makeClient(ClientSettings settings);
 
 }  // namespace tonewerk

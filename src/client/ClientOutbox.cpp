@@ -29,6 +29,9 @@ bool fitsFrame(const ValueMap& configuration) {
   return body.size() + kFrameHeadBytes + kReporterIDBytes <= kMostFrameBytes;
 }
 
+// A command of a session marks each of its senders' rings.
+std::size_t markBytes(const twr_session& session) { return session.senders.size() * sizeof(RingMark); }
+
 }  // namespace
 
 ClientOutbox::ClientOutbox(std::size_t queueBytes, Deliveries& deliveries)
@@ -57,7 +60,7 @@ twr_status ClientOutbox::change(twr_session& session, SessionChange change, Pend
   Command command;
   command.kind = Command::Kind::kChange;
   command.session = session.shared_from_this();
-  command.bytes = Command::kOverheadBytes + change.configuration.bytes();
+  command.bytes = Command::kOverheadBytes + change.configuration.bytes() + markBytes(session);
   command.change = std::make_unique<SessionChange>(std::move(change));
   session.wanted = std::move(wanted);
 
@@ -89,10 +92,13 @@ twr_status ClientOutbox::send(twr_session* session, RingMessage message,
   if (hasEnded_) return TWR_NOT_CONNECTED;
   Command command;
   command.bytes = Command::kOverheadBytes + message.bytes.size() + kMessageFrameBytes +
-                  reporterIDs.size() * kReporterIDBytes;
+                  reporterIDs.size() * kReporterIDBytes + (session == nullptr ? 0 : markBytes(*session));
   if (!queue_.hasRoomForMessage(command.bytes) || (reply && !acceptReply(false))) {
     ++dropped_;
-    if (session != nullptr) ++session->dropped;
+    if (session != nullptr) {
+      ++session->dropped;
+      session->droppedCategory = message.category;
+    }
     return TWR_FULL;
   }
   if (session != nullptr) {
@@ -231,6 +237,8 @@ void ClientOutbox::encodeChange(Command command) {
 
   const SessionChange& change = *command.change;
   const bool wasStarted = session.sent.isStarted;
+  if (session.sent.exists && (change.kind == Kind::kStop || change.kind == Kind::kDestroy))
+    appendLoss(session);
   session.sent.apply(change);
   ReplyTable::Entry entry;
   if (change.kind == Kind::kStart) {
@@ -421,6 +429,12 @@ void ClientOutbox::appendFromRing(twr_session& session, RingMessage message) {
   ++ringMessages_;
 }
 
+// What was dropped and no message has told of: the last chance while the session runs.
+void ClientOutbox::appendLoss(twr_session& session) {
+  if (session.dropped == 0) return;
+  appendFromRing(session, {session.droppedCategory, TWR_TYPE_UNKNOWN, coarseSeconds(), 0, 0, {}});
+}
+
 // Nobody takes what is in them, or too slowly: it goes to the queue, within its bound.
 void ClientOutbox::absorbClosedRings() {
   std::size_t bytes = 0;
@@ -470,6 +484,7 @@ void ClientOutbox::absorbMessage(twr_session& session, RingMessage message, Comm
     const std::uint64_t itself = message.entries == 0 && message.type == TWR_TYPE_UNKNOWN ? 0 : 1;
     dropped_ += itself;
     session.dropped += message.dropped + itself;
+    session.droppedCategory = message.category;
     return;
   }
   message.dropped += std::exchange(session.dropped, 0);

@@ -106,6 +106,7 @@ class ClientOutbox {
   bool drainMarks(Command& command);
   bool drain(twr_sender& sender, std::uint64_t position);
   void appendFromRing(twr_session& session, RingMessage message);
+  void appendLoss(twr_session& session);
   void absorbClosedRings();
   void absorb(twr_sender& sender);
   void absorbUpTo(twr_sender& sender, std::uint64_t position, CommandQueue::Iterator place);

@@ -1,8 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "client/ClientRegistry.h"
 
+#include <chrono>
+#include <memory>
 #include <mutex>
 #include <pthread.h>
+#include <utility>
 
 #include "client/ClientEngine.h"
 
@@ -33,16 +36,25 @@ void afterForkInChild() {
   mutex.unlock();
 }
 
-ClientEngine* firstWithThread() {
+// A client that stays as long as this is held, whoever destroys it meanwhile.
+struct HeldClient {
+  ClientEngine* engine = nullptr;
+  std::shared_ptr<void> owner;
+};
+
+template <class Condition>
+HeldClient firstOf(Condition isWanted) {
   const std::lock_guard lock(mutex);
   for (ClientEngine* engine = first; engine != nullptr; engine = engine->nextClient)
-    if (engine->hasThread()) return engine;
-  return nullptr;
+    if (isWanted(*engine)) return {engine, engine->owner};
+  return {};
 }
 
 // The library is unloaded, or the program ends. The clients' memory stays: somebody may still hold them.
 __attribute__((destructor)) void endThreads() {
-  while (ClientEngine* engine = firstWithThread()) engine->abandon();
+  const auto hasThread = [](const ClientEngine& engine) { return engine.hasThread(); };
+  for (HeldClient client = firstOf(hasThread); client.engine != nullptr; client = firstOf(hasThread))
+    client.engine->abandon();
 }
 
 }  // namespace
@@ -58,20 +70,22 @@ bool add(ClientEngine& engine) {
   return true;
 }
 
-void remove(ClientEngine& engine) {
+std::shared_ptr<void> remove(ClientEngine& engine) {
   const std::lock_guard lock(mutex);
   for (ClientEngine** link = &first; *link != nullptr; link = &(*link)->nextClient) {
     if (*link != &engine) continue;
     *link = engine.nextClient;
-    return;
+    break;
   }
+  return std::move(engine.owner);
 }
 
-bool isClientThread() {
-  const std::lock_guard lock(mutex);
-  for (const ClientEngine* engine = first; engine != nullptr; engine = engine->nextClient)
-    if (engine->isThisThread()) return true;
-  return false;
+void buryOrphans() {
+  const auto isDead = [](const ClientEngine& engine) { return engine.isDeadOrphan(); };
+  for (HeldClient client = firstOf(isDead); client.engine != nullptr; client = firstOf(isDead)) {
+    client.engine->end(std::chrono::milliseconds::zero());
+    remove(*client.engine);
+  }
 }
 
 }  // namespace tonewerk::clientRegistry

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <memory>
+
 namespace tonewerk {
 
 class ClientEngine;
@@ -10,9 +12,11 @@ namespace clientRegistry {
 
 // False without memory for what fork() is to call.
 bool add(ClientEngine& engine);
-void remove(ClientEngine& engine);
-// Whether the caller is the thread of a client, of whichever: inside a callback. Under no engine's mutex.
-bool isClientThread();
+// Its owner, which is gone when the caller drops it, unless the library's end still holds it, too.
+std::shared_ptr<void> remove(ClientEngine& engine);
+// Removes and destroys the clients that were destroyed inside their own callbacks and have come to their end.
+// Not inside a callback.
+void buryOrphans();
 
 }  // namespace clientRegistry
 }  // namespace tonewerk

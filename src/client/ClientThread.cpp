@@ -4,6 +4,11 @@
 #include <csignal>
 
 namespace tonewerk {
+namespace {
+
+thread_local bool isClientThread = false;
+
+}  // namespace
 
 bool ClientThread::start(const char* name, Function function, void* argument) {
   function_ = function;
@@ -19,13 +24,12 @@ bool ClientThread::start(const char* name, Function function, void* argument) {
   return isRunning_;
 }
 
-void ClientThread::join() {
-  if (!isRunning_) return;
-  ::pthread_join(thread_, nullptr);
-  isRunning_ = false;
-}
+bool ClientThread::isCurrent() { return isClientThread; }
+
+void ClientThread::becomeForked() { isClientThread = false; }
 
 void* ClientThread::run(void* self) {
+  isClientThread = true;
   const ClientThread& thread = *static_cast<ClientThread*>(self);
   thread.function_(thread.argument_);
   return nullptr;

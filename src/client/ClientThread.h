@@ -17,9 +17,15 @@ class ClientThread {
   bool start(const char* name, Function function, void* argument);
   bool isRunning() const { return isRunning_; }
   bool isThisThread() const { return isRunning_ && ::pthread_equal(thread_, ::pthread_self()) != 0; }
-  void join();
-  // In a child process.
+  // Waits for the thread's end; isRunning() stays. Once, and any thread but this one.
+  void join() { ::pthread_join(thread_, nullptr); }
+  // After join(), or in a child process.
   void forget() { isRunning_ = false; }
+
+  // Whether the calling thread is one of these.
+  static bool isCurrent();
+  // In a child process that one of these has forked: the caller is an ordinary thread there.
+  static void becomeForked();
 
  private:
   static void* run(void* self);

@@ -36,9 +36,10 @@ struct twr_session : std::enable_shared_from_this<twr_session> {  // NOLINT(read
   // Those who wait for the present run to stop; null when nobody does.
   std::shared_ptr<tonewerk::StartReplies> starts;
 
-  std::uint64_t dropped = 0;  // since the message before
-  std::size_t queued = 0;     // commands that wait in the queue
-  std::size_t unsent = 0;     // frames that are being sent
+  std::uint64_t dropped = 0;          // since the message before
+  std::uint32_t droppedCategory = 0;  // of the last of them
+  std::size_t queued = 0;             // commands that wait in the queue
+  std::size_t unsent = 0;             // frames that are being sent
   // The last command in the queue, when it is one that leads to a state; nothing of the session follows it.
   tonewerk::Command* lastReconciliation = nullptr;
 

@@ -114,8 +114,12 @@ twr_status change(twr_session* session, SessionChange change, PendingReply reply
 }  // namespace
 
 twr_client* makeClient(ClientSettings settings) {
-  auto client = std::make_unique<twr_client>(std::move(settings));
-  return clientRegistry::add(client->engine) ? client.release() : nullptr;
+  if (!ClientThread::isCurrent()) clientRegistry::buryOrphans();
+  const auto client = std::make_shared<twr_client>(std::move(settings));
+  client->engine.owner = client;
+  if (clientRegistry::add(client->engine)) return client.get();
+  client->engine.owner = nullptr;
+  return nullptr;
 }
 
 }  // namespace tonewerk
@@ -158,11 +162,13 @@ twr_client* twr_client_create(const twr_client_options* options) {
 
 void twr_client_destroy(twr_client* client, int timeoutMs) {
   if (client == nullptr) return;
-  const bool hasForked = client->engine.hasForked();
-  if (!hasForked && clientRegistry::isClientThread()) return;
-  if (!hasForked) client->engine.end(milliseconds(timeoutMs));
-  clientRegistry::remove(client->engine);
-  delete client;
+  ClientEngine& engine = client->engine;
+  if (!engine.hasForked()) {
+    if (engine.endByItself(milliseconds(timeoutMs))) return;
+    engine.end(milliseconds(timeoutMs));
+  }
+  clientRegistry::remove(engine).reset();
+  if (!ClientThread::isCurrent()) clientRegistry::buryOrphans();
 }
 
 twr_status twr_client_connect(twr_client* client, int timeoutMs) {

@@ -432,6 +432,52 @@ TEST_F(ClientEngineTest, TellsOfMessagesThatARingDropped) {
   EXPECT_EQ(info().messages_dropped, 1U);
 }
 
+TEST_F(ClientEngineTest, TheMessageAfterAFullRingSaysHowManyItDropped) {
+  daemon.reset();  // nobody empties the ring
+  session = twr_session_create(client, 77);
+  twr_sender* sender = twr_sender_open(session, 256);
+  TestPayload payload;
+  twr_put_int(payload.get(), "number", 5);
+  twr_put_double(payload.get(), "twreporting_timestamp", 1.5);
+  const auto push = [&] { return twr_sender_send(sender, TWR_CATEGORY_VOLUME, 0, payload.get()); };
+  int taken = 0;
+  while (push() == TWR_OK) ++taken;
+  ASSERT_GT(taken, 0);
+  EXPECT_EQ(push(), TWR_FULL);
+
+  daemon = std::make_unique<ScriptedDaemon>(path);
+  const auto connection = daemon->accept();
+  EXPECT_EQ(connection->nextText(), "createReportingSession 77");
+  for (int at = 0; at < taken; ++at) EXPECT_EQ(connection->nextText(), message(5));
+  EXPECT_EQ(push(), TWR_OK);
+  EXPECT_EQ(connection->nextText(), message(5, ",\"twreporting_dropped\":2"));
+  EXPECT_EQ(push(), TWR_OK);
+  EXPECT_EQ(connection->nextText(), message(5));
+  twr_sender_close(sender);
+}
+
+TEST_F(ClientEngineTest, ASessionsEndSaysWhatNoMessageHasSaid) {
+  daemon.reset();
+  ClientSettings chosen = settings(path);
+  chosen.queueBytes = 2048;
+  makeClientWith(chosen);
+  session = twr_session_create(client, 77);
+  int taken = 0;
+  while (send(taken) == TWR_OK) ++taken;
+  EXPECT_EQ(send(taken), TWR_FULL);
+  twr_session_destroy(session, nullptr, nullptr);
+
+  daemon = std::make_unique<ScriptedDaemon>(path);
+  const auto connection = daemon->accept();
+  EXPECT_EQ(connection->nextText(), "createReportingSession 77");
+  for (int at = 0; at < taken; ++at) EXPECT_EQ(connection->nextText(), message(at));
+  const RpcFrame loss = connection->next();
+  EXPECT_EQ(loss.arguments.at(0)->asMap()->integer("twreporting_dropped"), 2);
+  EXPECT_EQ(loss.arguments.at(1)->integer(), TWR_CATEGORY_VOLUME);
+  EXPECT_EQ(loss.arguments.at(2)->integer(), TWR_TYPE_UNKNOWN);
+  EXPECT_EQ(connection->nextText(), "destroyReportingSession 77");
+}
+
 TEST_F(ClientEngineTest, OpensNoRingOverItsBound) {
   session = twr_session_create(client, 77);
   EXPECT_EQ(twr_sender_open(session, TWR_MOST_RING_BYTES + 1), nullptr);

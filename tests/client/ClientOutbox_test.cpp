@@ -529,9 +529,10 @@ class ModelDaemon {
       known(identifier(1)).apply({Kind::kServiceType, static_cast<std::uint16_t>(identifier(0)), {}});
     if (frame.method == "setConfiguration")
       known(identifier(1)).configuration.merge(*frame.arguments[0]->asMap());
-    if (frame.method == "sendMessage")
-      messages_[frame.arguments[3]->asArray()->begin()->integer()].push_back(
-          frame.arguments[0]->asMap()->integer("n"));
+    if (frame.method != "sendMessage") return;
+    const ValueMap& message = *frame.arguments[0]->asMap();
+    messages_[frame.arguments[3]->asArray()->begin()->integer()].push_back(message.integer("n"));
+    toldDropped_ += static_cast<std::uint64_t>(message.integer("twreporting_dropped"));
   }
   SessionState& known(std::int64_t identifier) {
     EXPECT_TRUE(sessions_.contains(identifier)) << "the daemon knows no session " << identifier;
@@ -539,8 +540,10 @@ class ModelDaemon {
   }
   const std::map<std::int64_t, SessionState>& sessions() const { return sessions_; }
   std::map<std::int64_t, std::vector<std::int64_t>>& messages() { return messages_; }
+  std::uint64_t toldDropped() const { return toldDropped_; }
 
  private:
+  std::uint64_t toldDropped_ = 0;
   std::map<std::int64_t, SessionState> sessions_;
   std::map<std::int64_t, std::vector<std::int64_t>> messages_;
 };
@@ -630,8 +633,11 @@ TEST_F(ClientOutboxTest, LeadsTheDaemonToWhatWasAskedForHoweverTheConnectionBrea
       }
     }
     if (!isConnected) connect();
-    while (sendSome(isTight ? 10'000 : 100)) {
-    }
+    const auto sendAll = [&] {
+      while (sendSome(isTight ? 10'000 : 100)) {
+      }
+    };
+    sendAll();
     ASSERT_EQ(outbox->queuedBytes(), 0U);
     ASSERT_EQ(daemon.sessions().size(), sessions.size());
     for (const std::shared_ptr<twr_session>& one : sessions) {
@@ -645,6 +651,14 @@ TEST_F(ClientOutboxTest, LeadsTheDaemonToWhatWasAskedForHoweverTheConnectionBrea
     std::erase_if(daemon.messages(), [](const auto& entry) { return entry.second.empty(); });
     if (!isTight) {
       EXPECT_EQ(daemon.messages(), accepted);
+    }
+    // Their ends tell what no message has told. Of a session that the daemon never heard of, which takes a
+    // queue without any room, nothing is told.
+    for (const std::shared_ptr<twr_session>& one : sessions) outbox->destroy(*one, {});
+    sendAll();
+    EXPECT_LE(daemon.toldDropped(), outbox->messagesDropped());
+    if (!isTight) {
+      EXPECT_EQ(daemon.toldDropped(), outbox->messagesDropped());
     }
     if (HasFailure()) return;
   }

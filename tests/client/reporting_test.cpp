@@ -4,6 +4,7 @@
 
 #include <gmock/gmock.h>
 #include <limits>
+#include <thread>
 
 #include "client/ClientTest.h"
 #include "platform/linux/RpcLimits.h"
@@ -351,13 +352,46 @@ TEST_F(ReportingTest, MayBeAskedForMoreInsideACallback) {
     EXPECT_EQ(send(2, AnswerLog::note, inner), TWR_OK);
     EXPECT_EQ(twr_client_flush(client, 1000), TWR_WOULD_WAIT);
     EXPECT_EQ(twr_client_connect(client, 1000), TWR_WOULD_WAIT);
-    twr_client_destroy(client, 1000);  // does nothing
   });
   ASSERT_EQ(send(1, AnswerLog::note, context), TWR_OK);
   connection->answer(connection->next().identifier, std::nullopt);
   connection->answer(connection->next().identifier, std::nullopt);
   EXPECT_EQ(log.next(), "outer: done");
   EXPECT_EQ(log.next(), "inner: done");
+}
+
+// It used to do nothing there, and a program that let go of its last share in a reply kept the client for
+// good.
+TEST_F(ReportingTest, MayBeDestroyedInsideItsOwnCallback) {
+  ClientSettings chosen = settings(path);
+  chosen.stateChanged = AnswerLog::noteState;
+  chosen.context = &log;
+  makeClientWith(chosen);
+  const auto connection = connectWithSession();
+  EXPECT_EQ(log.next(), "state " + std::to_string(TWR_STATE_CONNECTING));
+  EXPECT_EQ(log.next(), "state " + std::to_string(TWR_STATE_CONNECTED));
+  void* last = log.as("last", [&](const twr_answer&) { twr_client_destroy(client, 0); });
+  ASSERT_EQ(send(1, AnswerLog::note, last), TWR_OK);
+  ASSERT_EQ(send(2, AnswerLog::note, log.as("pending")), TWR_OK);
+  connection->answer(connection->next().identifier, std::nullopt);
+  EXPECT_EQ(log.next(), "last: done");
+  EXPECT_EQ(log.next(), "pending: not connected to the daemon");
+  EXPECT_TRUE(connection->waitForEnd());
+  client = makeClient(settings(path));  // and buries the other
+  EXPECT_THAT(log.rest(), IsEmpty());
+}
+
+TEST_F(ReportingTest, ClientsMayGoWhileOthersAreAsked) {
+  const auto connection = connectWithSession();
+  std::thread other([&] {
+    for (int at = 0; at < 50; ++at) {
+      twr_client* own = makeClient(settings(path + "-nobody"));
+      twr_session_create(own, at + 1);
+      twr_client_destroy(own, 0);
+    }
+  });
+  for (int at = 0; at < 50; ++at) EXPECT_EQ(twr_client_flush(client, kScriptPatienceMs), TWR_OK);
+  other.join();
 }
 
 }  // namespace
