@@ -14,6 +14,7 @@
 #include "platform/linux/PrivateBus.h"
 #include "support/TemporaryDirectory.h"
 #include "system/support/DaemonTest.h"
+#include "system/support/RecordedEvents.h"
 
 namespace tonewerk {
 namespace {
@@ -130,6 +131,11 @@ TEST_F(DbusTest, TheSessionsOfANameThatVanishesStop) {
   }
   EXPECT_TRUE(waitForLogLine("stop called. reporterID=77"));
   EXPECT_TRUE(waitUntil([&] { return client.allReporters().empty(); }));
+  const char* uptime = "com.orvane.tonewerk.twreportingclientuptime";
+  const auto recorded = [&] { return RecordedEvents(daemon.storePath()).named(uptime); };
+  ASSERT_TRUE(waitUntil([&] { return !recorded().empty(); }));
+  EXPECT_TRUE(recorded().at(0).at("processName").is_string());
+  EXPECT_GE(recorded().at(0).at("seconds").get<double>(), 0.0);
 }
 
 TEST_F(DbusTest, WrongCallsAreRefusedAndChangeNothing) {
