@@ -117,7 +117,7 @@ TWR_API twr_status twr_put_double(twr_payload* payload, const char* name, double
 TWR_API twr_status twr_put_text(twr_payload* payload, const char* name, const char* value);
 /* `size` bytes of UTF-8, a zero byte among them or not. */
 TWR_API twr_status twr_put_text_n(twr_payload* payload, const char* name, const char* value, size_t size);
-/* Seconds since 1970 UTC, with fractions down to nanoseconds. */
+/* Seconds since 1970 UTC, with fractions down to nanoseconds; TWR_INVALID for what is no time, as NaN. */
 TWR_API twr_status twr_put_date(twr_payload* payload, const char* name, double seconds);
 /* Only in the outermost list of twr_client_request(): a parameter that is left out. */
 TWR_API twr_status twr_put_nil(twr_payload* payload);
@@ -150,7 +150,8 @@ typedef struct twr_answer {
 /*
  * Called once for a request that was taken (TWR_OK), on the client's background thread, in the order in which
  * the daemon completes requests; with TWR_NOT_CONNECTED when the connection ended before, or the client was
- * destroyed. May call anything here but what waits. NULL where no answer is wanted: the request is then sent
+ * destroyed: whether the request was carried out is then not known. twr_client_flush() does not wait for it.
+ * May call anything here but what waits. NULL where no answer is wanted: the request is then sent
  * as one that has none, which costs both sides less.
  */
 typedef void (*twr_reply)(void* context, const twr_answer* answer);
@@ -172,11 +173,10 @@ enum {
 };
 
 typedef struct twr_client_options {
-  size_t size; /* sizeof(twr_client_options) */
-  const char*
-      socket_path;    /* NULL: $TONEWERK_REPORTING_SOCKET, else the own runtime directory's, then /run's */
-  size_t queue_bytes; /* of messages that wait for the daemon; 0: 256 KiB */
-  unsigned flags;     /* TWR_CLIENT_ONCE */
+  size_t size;             /* sizeof(twr_client_options) */
+  const char* socket_path; /* NULL or "": $TONEWERK_REPORTING_SOCKET, else the own, then the system's */
+  size_t queue_bytes;      /* of messages that wait for the daemon; 0: 256 KiB */
+  unsigned flags;          /* TWR_CLIENT_ONCE */
   /* On the background thread, at each change; NULL for none. The same rules as for twr_reply. */
   void (*state_changed)(void* context, twr_state state);
   void* context;

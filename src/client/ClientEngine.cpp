@@ -223,12 +223,14 @@ void ClientEngine::finish(Lock& lock) {
 
 void ClientEngine::attempt(Lock& lock) {
   setState(TWR_STATE_CONNECTING);
-  int error = ENOENT;
+  // The first place at which there is something says more than the last, at which there may be nothing.
+  int problem = ENOENT;
   for (const std::string& path : settings_.socketPaths) {
-    error = connectTo(lock, path);
+    const int error = connectTo(lock, path);
     if (error == 0) return connected(path);
+    if (problem == ENOENT) problem = error;
   }
-  attemptFailed(error);
+  attemptFailed(problem);
 }
 
 // The descriptor is the member all the while, so that a child process closes its copy.
@@ -281,7 +283,11 @@ void ClientEngine::waitBeforeNextAttempt(int error) {
     return;
   }
   nextAttempt_ = Clock::now() + backoff_.next();
-  setState(TWR_STATE_WAITING);
+  if (isEnding_) {
+    state_ = TWR_STATE_WAITING;  // not for long, and nobody need be told
+  } else {
+    setState(TWR_STATE_WAITING);
+  }
 }
 
 void ClientEngine::transmit(Lock& lock) {

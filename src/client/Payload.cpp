@@ -166,6 +166,11 @@ twr_status twr_put_text_n(twr_payload* payload, const char* name, const char* va
 }
 
 twr_status twr_put_date(twr_payload* payload, const char* name, double seconds) {
+  constexpr double kTwoTo63 = 9223372036854775808.0;  // what a date's whole seconds are below
+  const bool isDate = seconds >= -kTwoTo63 && seconds < kTwoTo63;
+  if (payload != nullptr && payload->problem == TWR_OK && !isDate) {
+    return tonewerk::mark(*payload, TWR_INVALID);
+  }
   return put(payload, name, [=](Packer& packer) { packer.date(tonewerk::Date{seconds}); });
 }
 

@@ -49,8 +49,8 @@ ClientSettings settingsOf(const twr_client_options* given) {
   // A caller may know of fewer members than there are.
   if (given != nullptr) std::memcpy(&options, given, std::min(given->size, sizeof(options)));
   ClientSettings settings;
-  settings.socketPaths =
-      options.socket_path == nullptr ? defaultSocketPaths() : std::vector<std::string>{options.socket_path};
+  const bool isChosen = options.socket_path != nullptr && *options.socket_path != '\0';
+  settings.socketPaths = isChosen ? std::vector<std::string>{options.socket_path} : defaultSocketPaths();
   if (options.queue_bytes != 0) settings.queueBytes = options.queue_bytes;
   settings.isOnce = (options.flags & TWR_CLIENT_ONCE) != 0;
   settings.stateChanged = options.state_changed;

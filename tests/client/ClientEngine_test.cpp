@@ -478,6 +478,15 @@ TEST_F(ClientEngineTest, ASessionsEndSaysWhatNoMessageHasSaid) {
   EXPECT_EQ(connection->nextText(), "destroyReportingSession 77");
 }
 
+TEST_F(ClientEngineTest, SaysWhyThePlaceWithASocketFailed) {
+  daemon.reset();  // its socket stays
+  ClientSettings chosen = settings(path);
+  chosen.socketPaths.push_back(path + "-nobody");
+  makeClientWith(chosen);
+  EXPECT_EQ(twr_client_connect(client, kScriptPatienceMs), TWR_NOT_CONNECTED);
+  EXPECT_EQ(info().last_error, ECONNREFUSED);
+}
+
 TEST_F(ClientEngineTest, OpensNoRingOverItsBound) {
   session = twr_session_create(client, 77);
   EXPECT_EQ(twr_sender_open(session, TWR_MOST_RING_BYTES + 1), nullptr);

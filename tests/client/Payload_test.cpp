@@ -187,6 +187,15 @@ TEST_F(PayloadTest, NeedsNoMoreThanTheHeaderPromises) {
   EXPECT_EQ(putValue(exact.get(), name.c_str(), ValueMap{}), TWR_OK);
 }
 
+TEST_F(PayloadTest, RefusesADateThatIsNone) {
+  for (const double none : {std::nan(""), HUGE_VAL, -HUGE_VAL, 1e300, -1e19}) {
+    TestPayload own;
+    EXPECT_EQ(twr_put_date(own.get(), "date", none), TWR_INVALID) << none;
+    EXPECT_EQ(twr_payload_problem(own.get()), TWR_INVALID);
+    EXPECT_EQ(own.get()->size, 0U);
+  }
+}
+
 TEST_F(PayloadTest, HasNoRoomWithoutMemory) {
   twr_payload_init(p, nullptr, 100);
   EXPECT_EQ(twr_payload_problem(p), TWR_OK);

@@ -6,10 +6,13 @@
 #include <sstream>
 #include <stdlib.h>
 #include <string>
+#include <sys/socket.h>
 #include <vector>
 
+#include "platform/linux/FileDescriptor.h"
 #include "platform/linux/NlohmannJsonService.h"
 #include "platform/linux/ReportStore.h"
+#include "platform/linux/UnixAddress.h"
 #include "support/ManualClock.h"
 #include "support/MemoryLog.h"
 #include "support/MemoryPreferenceStore.h"
@@ -84,6 +87,12 @@ TEST_F(CommandLineTest, SaysItsVersion) {
   EXPECT_THAT(output(), StartsWith("twctl "));
 }
 
+TEST_F(CommandLineTest, SaysThatItCouldNotWrite) {
+  out_.setstate(std::ios::badbit);  // as on a full disk
+  EXPECT_EQ(run({"--help"}), kRefused);
+  EXPECT_THAT(errors(), HasSubstr("cannot write"));
+}
+
 TEST_F(CommandLineTest, CallsWrongUsageWrong) {
   for (const std::vector<std::string>& wrong : std::vector<std::vector<std::string>>{
            {},
@@ -111,6 +120,9 @@ TEST_F(CommandLineTest, CallsWrongUsageWrong) {
            {"power", "more"},
            {"defaults"},
            {"channels", "more"},
+           {"top", "--interval", "0"},
+           {"top", "--interval", "nan"},
+           {"channels", "--watch", "nan"},
            {"defaults", "write", "a.b", "c"},
            {"notify"},
            {"notify", "post"},
@@ -130,6 +142,17 @@ TEST_F(CommandLineTest, SaysWhereNoDaemonListens) {
     EXPECT_EQ(run(command), kNoDaemon);
     EXPECT_THAT(errors(), HasSubstr("no daemon listens on " + socket_));
   }
+}
+
+// The reason of the place that was looked at last said that there is no file.
+TEST_F(CommandLineTest, SaysThatADaemonHasLeftItsSocket) {
+  unsetenv("TONEWERK_REPORTING_SOCKET");
+  std::filesystem::create_directory(directory_.path("runtime"));
+  const FileDescriptor left(::socket(AF_UNIX, SOCK_STREAM, 0));
+  const auto address = unixAddressOf(directory_.path("runtime/reporting.sock"));
+  ASSERT_TRUE(address && ::bind(left.get(), generic(*address), sizeof(*address)) == 0);
+  EXPECT_EQ(run({"list"}), kNoDaemon);
+  EXPECT_THAT(errors(), HasSubstr("Connection refused"));
 }
 
 TEST_F(CommandLineTest, ListsSessions) {

@@ -43,10 +43,12 @@ int runCommandLine(int argc, const char* const* argv, Tool& tool) {
   try {
     app.parse(argc, argv);
   } catch (const CLI::ParseError& error) {
-    return app.exit(error, tool.out, tool.err) == 0 ? kDone : kWrongUsage;
+    tool.status = app.exit(error, tool.out, tool.err) == 0 ? kDone : kWrongUsage;
   } catch (const std::exception& error) {
     return tool.fail(kRefused, error.what());
   }
+  // A full disk, say: half of a list must not pass for all of it.
+  if (!tool.out.flush() && tool.status == kDone) return tool.fail(kRefused, "cannot write the output");
   return tool.status;
 }
 

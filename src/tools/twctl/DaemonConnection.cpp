@@ -204,17 +204,19 @@ DaemonConnection::DaemonConnection() = default;
 DaemonConnection::~DaemonConnection() = default;
 
 std::error_code DaemonConnection::connect(const std::vector<std::string>& paths) {
-  std::error_code error = std::make_error_code(std::errc::no_such_file_or_directory);
+  // The first place at which there is something says more than the last, at which there may be nothing.
+  std::error_code problem = std::make_error_code(std::errc::no_such_file_or_directory);
   for (const std::string& path : paths) {
     library_.reset();
     inbox_ = std::make_unique<Inbox>();
     library_ = std::make_unique<Library>(path, *inbox_);
-    error = library_->connect();
+    const std::error_code error = library_->connect();
     if (!error) return {};
+    if (problem == std::errc::no_such_file_or_directory) problem = error;
   }
   library_.reset();
   inbox_.reset();
-  return error;
+  return problem;
 }
 
 int DaemonConnection::fileDescriptor() const { return inbox_ ? inbox_->fileDescriptor() : -1; }

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <CLI/CLI.hpp>
 #include <chrono>
+#include <cmath>
 #include <memory>
 #include <optional>
 #include <ostream>
@@ -148,7 +149,11 @@ void addTopCommand(CLI::App& app, Tool& tool) {
   command.add_option("--interval", *interval, "Over so many seconds messages are counted (1)")
       ->check(CLI::Range(kLeastSeconds, kMostSeconds))
       ->type_name("SECONDS");
-  command.callback([&tool, interval] { top(tool, *interval); });
+  command.callback([&tool, interval] {
+    // Which is within any range.
+    if (std::isnan(*interval)) throw CLI::ValidationError("--interval", "must be a number");
+    top(tool, *interval);
+  });
 }
 
 }  // namespace tonewerk
