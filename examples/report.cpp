@@ -1,6 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-// Reports a session that plays for a moment, with messages from its audio thread.
-//   c++ -std=c++17 report.cpp $(pkg-config --cflags --libs twreporting) -pthread && ./a.out
+// A session with an audio thread: c++ report.cpp $(pkg-config --cflags --libs twreporting) -pthread
 #include <chrono>
 #include <cstdio>
 #include <functional>
@@ -17,14 +16,12 @@ static void play(tr::Sender& sender) {
     sender.send(tr::Category::kPerformance, tr::Type::kState, payload);
   }
 }
-
 int main() {
   tr::Client client;
   {
     tr::Session session(client);
     session.setServiceType(tr::Service::kLongFormAudio);
     session.start([](const tr::Answer& stopped) { std::printf("stopped: %s\n", tr::text(stopped.status)); });
-
     tr::Sender sender(session);
     std::thread audio(play, std::ref(sender));
     audio.join();
