@@ -13,14 +13,12 @@ namespace {
 
 using Kind = SessionChange::Kind;
 
-constexpr std::size_t kNotificationHeadBytes = 2;
 constexpr std::size_t kLeastReplies = 64;
 
 std::string messageBody(const RingMessage& message, std::span<const std::int64_t> reporterIDs) {
-  std::string frame;
-  appendMessageFrame(frame, std::nullopt, message, reporterIDs);
-  frame.erase(0, kNotificationHeadBytes);
-  return frame;
+  std::string body;
+  appendMessageBody(body, message, reporterIDs);
+  return body;
 }
 
 bool fitsFrame(const ValueMap& configuration) {

@@ -3,6 +3,7 @@
 
 #include <string_view>
 
+#include "client/RequestBody.h"
 #include "platform/linux/RpcPacker.h"
 
 namespace tonewerk {
@@ -10,11 +11,6 @@ namespace {
 
 constexpr std::string_view kTimestamp = "twreporting_timestamp";
 constexpr std::string_view kDropped = "twreporting_dropped";
-
-struct Output {
-  std::string& text;
-  void write(const char* data, std::size_t size) { text.append(data, size); }
-};
 
 // Reads one object and remembers whether it is the time stamp's name.
 class NameVisitor : public msgpack::null_visitor {
@@ -69,15 +65,18 @@ bool isStamped(std::string_view bytes) {
 
 void appendMessageFrame(std::string& out, std::optional<std::uint32_t> requestIdentifier,
                         const RingMessage& message, std::span<const std::int64_t> reporterIDs) {
+  appendFrameHead(out, requestIdentifier);
+  appendMessageBody(out, message, reporterIDs);
+}
+
+void appendMessageBody(std::string& out, const RingMessage& message,
+                       std::span<const std::int64_t> reporterIDs) {
   const std::string_view bytes(reinterpret_cast<const char*>(message.bytes.data()), message.bytes.size());
   const bool stamps = !isStamped(bytes);
   const bool tellsLoss = message.dropped > 0;
 
-  Output output{out};
+  StringOutput output{out};
   RpcPacker packer(output);
-  packer.pack_array(requestIdentifier ? 4 : 3);
-  packer.pack_uint8(requestIdentifier ? 0 : 2);
-  if (requestIdentifier) packer.pack_uint32(*requestIdentifier);
   packer.text("sendMessage");
   packer.pack_array(4);
   packer.pack_map(message.entries + (stamps ? 1U : 0U) + (tellsLoss ? 1U : 0U));

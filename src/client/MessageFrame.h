@@ -27,5 +27,8 @@ constexpr bool fitsMessageFrame(std::size_t payloadBytes, std::size_t reporterID
 // something was. Without reporter identifiers the message is for every started session.
 void appendMessageFrame(std::string& out, std::optional<std::uint32_t> requestIdentifier,
                         const RingMessage& message, std::span<const std::int64_t> reporterIDs);
+// The same without how frames begin: a body, as requests have one (client/RequestBody.h).
+void appendMessageBody(std::string& out, const RingMessage& message,
+                       std::span<const std::int64_t> reporterIDs);
 
 }  // namespace tonewerk

@@ -3,6 +3,7 @@
 
 #include <utility>
 
+#include "client/RequestBody.h"
 #include "client/SessionRecord.h"
 
 namespace tonewerk {
@@ -13,9 +14,6 @@ void countUnsent(const OutgoingFrame& frame, bool isMore) {
   std::size_t& unsent = frame.command.session->unsent;
   isMore ? ++unsent : --unsent;
 }
-
-// Of a notification: an array of three and its kind.
-constexpr std::size_t kNotificationHeadBytes = 2;
 
 }  // namespace
 

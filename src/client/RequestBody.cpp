@@ -8,13 +8,6 @@
 namespace tonewerk {
 namespace {
 
-constexpr std::size_t kNotificationHeadBytes = 2;
-
-struct Output {
-  std::string& text;
-  void write(const char* data, std::size_t size) { text.append(data, size); }
-};
-
 std::string_view entriesOf(const twr_payload& payload) {
   return {reinterpret_cast<const char*>(payload.bytes), payload.size};
 }
@@ -22,7 +15,7 @@ std::string_view entriesOf(const twr_payload& payload) {
 }  // namespace
 
 void appendFrameHead(std::string& out, std::optional<std::uint32_t> requestIdentifier) {
-  Output output{out};
+  StringOutput output{out};
   RpcPacker packer(output);
   packer.pack_array(requestIdentifier ? 4 : 3);
   packer.pack_uint8(requestIdentifier ? 0 : 2);
@@ -36,7 +29,7 @@ void appendRequestBody(std::string& out, std::string_view method, const Argument
 }
 
 void appendRequestBody(std::string& out, std::string_view method, const twr_payload* parameters) {
-  Output output{out};
+  StringOutput output{out};
   RpcPacker packer(output);
   packer.text(method);
   packer.pack_array(parameters == nullptr ? 0 : parameters->entries);
@@ -45,7 +38,7 @@ void appendRequestBody(std::string& out, std::string_view method, const twr_payl
 
 std::optional<ValueMap> mapOf(const twr_payload& payload) {
   std::string frame;
-  Output output{frame};
+  StringOutput output{frame};
   RpcPacker packer(output);
   packer.pack_array(3);
   packer.pack_uint8(2);

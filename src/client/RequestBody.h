@@ -17,6 +17,8 @@ namespace tonewerk {
 
 // The longest beginning: an array, the kind and a message identifier.
 inline constexpr std::size_t kFrameHeadBytes = 7;
+// A notification's: an array of three and its kind.
+inline constexpr std::size_t kNotificationHeadBytes = 2;
 
 void appendFrameHead(std::string& out, std::optional<std::uint32_t> requestIdentifier);
 

@@ -7,7 +7,7 @@
 #include <vector>
 
 #include "bridges/pipewire/EventLoop.h"
-#include "platform/linux/FileDescriptor.h"
+#include "platform/linux/WakeEvent.h"
 
 namespace tonewerk {
 
@@ -30,7 +30,7 @@ class LoopInbox {
  private:
   void runAll();
 
-  const FileDescriptor event_;
+  WakeEvent event_;
   std::mutex mutex_;
   std::vector<std::function<void()>> posted_;  // under mutex_
   std::unique_ptr<EventLoop::Source> source_;  // last: its callback uses the others

@@ -13,6 +13,12 @@
 
 namespace tonewerk {
 
+// Output that grows a string.
+struct StringOutput {
+  std::string& text;
+  void write(const char* data, std::size_t size) { text.append(data, size); }
+};
+
 // MessagePack as this protocol has it. `Output` has write(const char* data, std::size_t size). Allocates
 // nothing itself.
 template <class Output>

@@ -11,13 +11,7 @@
 namespace tonewerk {
 namespace {
 
-// What the library writes to.
-struct Output {
-  std::string& text;
-  void write(const char* data, std::size_t size) { text.append(data, size); }
-};
-
-class ValuePacker : public RpcPacker<Output> {
+class ValuePacker : public RpcPacker<StringOutput> {
  public:
   using RpcPacker::RpcPacker;
 
@@ -92,7 +86,7 @@ class ValuePacker : public RpcPacker<Output> {
 }  // namespace
 
 void RpcWriter::request(std::uint32_t identifier, std::string_view method, const Arguments& arguments) {
-  Output output{out_};
+  StringOutput output{out_};
   ValuePacker packer(output);
   packer.pack_array(4);
   packer.pack_uint8(0);
@@ -102,7 +96,7 @@ void RpcWriter::request(std::uint32_t identifier, std::string_view method, const
 }
 
 void RpcWriter::notification(std::string_view method, const Arguments& arguments) {
-  Output output{out_};
+  StringOutput output{out_};
   ValuePacker packer(output);
   packer.pack_array(3);
   packer.pack_uint8(2);
@@ -112,7 +106,7 @@ void RpcWriter::notification(std::string_view method, const Arguments& arguments
 
 void RpcWriter::response(std::uint32_t identifier, const std::optional<ReplyError>& error,
                          const std::optional<Value>& result) {
-  Output output{out_};
+  StringOutput output{out_};
   ValuePacker packer(output);
   packer.pack_array(4);
   packer.pack_uint8(1);

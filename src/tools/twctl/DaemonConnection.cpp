@@ -6,13 +6,11 @@
 #include <deque>
 #include <mutex>
 #include <poll.h>
-#include <sys/eventfd.h>
-#include <unistd.h>
 #include <utility>
 
 #include "client/ValuePayload.h"
-#include "platform/linux/FileDescriptor.h"
 #include "platform/linux/RpcFrameReader.h"
+#include "platform/linux/WakeEvent.h"
 #include "tonewerk/reporting.h"
 
 namespace tonewerk {
@@ -73,9 +71,9 @@ class DaemonConnection::Inbox {
   };
   enum class Wait { kArrived, kGone, kTimedOut };
 
-  Inbox() : event_(::eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK)) {}
+  Inbox() { event_.open(); }
 
-  int fileDescriptor() const { return event_.get(); }
+  int fileDescriptor() const { return event_.fileDescriptor(); }
 
   void put(AnswerHandler handler, const twr_answer& answer) {
     // Who is connected no more gets no answer; that the connection is gone is told by itself.
@@ -88,13 +86,13 @@ class DaemonConnection::Inbox {
     }
     const std::lock_guard lock(mutex_);
     arrived_.push_back({std::move(handler), std::move(read)});
-    signal();
+    event_.signal();
   }
 
   void end() {
     const std::lock_guard lock(mutex_);
     isGone_ = true;
-    signal();
+    event_.signal();
   }
 
   // Does not wait, whatever it says: kTimedOut is that there is nothing.
@@ -110,7 +108,7 @@ class DaemonConnection::Inbox {
       const Wait now = state();
       const auto left = std::chrono::ceil<milliseconds>(until - std::chrono::steady_clock::now());
       if (now != Wait::kTimedOut || left <= milliseconds::zero()) return now;
-      pollfd polled{event_.get(), POLLIN, 0};
+      pollfd polled{event_.fileDescriptor(), POLLIN, 0};
       ::poll(&polled, 1, static_cast<int>(std::min<milliseconds::rep>(left.count(), kLongestPollMs)));
     }
   }
@@ -118,21 +116,14 @@ class DaemonConnection::Inbox {
   std::deque<Arrival> takeAll() {
     const std::lock_guard lock(mutex_);
     // A connection that is gone stays readable.
-    std::uint64_t count = 0;
-    if (!isGone_ && ::read(event_.get(), &count, sizeof(count)) < 0) count = 0;
+    if (!isGone_) event_.clear();
     return std::exchange(arrived_, {});
   }
 
  private:
   static constexpr milliseconds::rep kLongestPollMs = 60'000;
 
-  void signal() {
-    const std::uint64_t one = 1;
-    // Fails only where the counter is full, and then it is readable.
-    static_cast<void>(::write(event_.get(), &one, sizeof(one)) < 0);
-  }
-
-  const FileDescriptor event_;
+  WakeEvent event_;
   ResultReader reader_;  // the library's thread's
   std::mutex mutex_;     // guards what follows
   std::deque<Arrival> arrived_;

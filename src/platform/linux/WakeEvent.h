@@ -10,7 +10,7 @@
 
 namespace tonewerk {
 
-// Wakes a thread that polls. Once is enough until it has woken.
+// Wakes a thread that polls. Once is enough until it has woken. Any thread, but for open() and close().
 class WakeEvent {
  public:
   // False without descriptors.
