@@ -115,10 +115,7 @@ TEST_F(ClientEngineTest, KeepsWhatIsQueuedUntilThereIsADaemon) {
   ClientSettings chosen = settings(path);
   chosen.queueBytes = 2000;
   makeClientWith(chosen);
-  session = twr_session_create(client, 77);
-  int kept = 0;
-  while (send(kept) == TWR_OK) ++kept;
-  EXPECT_EQ(send(4711), TWR_FULL);
+  const int kept = fillQueue();
   EXPECT_EQ(info().messages_dropped, 2U);
   EXPECT_GT(info().queued_bytes, 0U);
   EXPECT_LE(info().queued_bytes, 2000U);
@@ -461,10 +458,7 @@ TEST_F(ClientEngineTest, ASessionsEndSaysWhatNoMessageHasSaid) {
   ClientSettings chosen = settings(path);
   chosen.queueBytes = 2048;
   makeClientWith(chosen);
-  session = twr_session_create(client, 77);
-  int taken = 0;
-  while (send(taken) == TWR_OK) ++taken;
-  EXPECT_EQ(send(taken), TWR_FULL);
+  const int taken = fillQueue();
   twr_session_destroy(session, nullptr, nullptr);
 
   daemon = std::make_unique<ScriptedDaemon>(path);

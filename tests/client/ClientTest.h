@@ -113,6 +113,14 @@ class ClientTest : public testing::Test {
     twr_put_double(payload.get(), "twreporting_timestamp", 1.5);
     return twr_session_send(session, TWR_CATEGORY_VOLUME, TWR_TYPE_GENERIC, payload.get(), reply, context);
   }
+  // Makes a session of 77 and sends 0, 1, 2 ... until the queue has refused two. How many it took.
+  int fillQueue() {
+    session = twr_session_create(client, 77);
+    int taken = 0;
+    while (send(taken) == TWR_OK) ++taken;
+    EXPECT_EQ(send(4711), TWR_FULL);
+    return taken;
+  }
   twr_client_info info() {
     twr_client_info known{};
     known.size = sizeof(known);

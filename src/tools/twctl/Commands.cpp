@@ -21,8 +21,8 @@ int runCommandLine(int argc, const char* const* argv, Tool& tool) {
   CLI::App app("Talks to the reporting daemon, and reads what it has stored.", "twctl");
   app.set_version_flag("--version", std::string("twctl ") + TONEWERK_VERSION);
   app.footer(
-      "Exit status: 0 done; 1 refused, not valid or not there; 2 wrong usage, a bad recording included;\n"
-      "3 no daemon answers.");
+      "Exit status: 0 done; 1 refused, not valid, not there, or output that cannot be written; 2 wrong\n"
+      "usage, a bad recording included; 3 no daemon answers.");
   app.require_subcommand(1);
   addCommonOptions(app, tool);
   addListCommand(app, tool);

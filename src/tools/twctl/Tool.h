@@ -15,7 +15,7 @@ class JsonService;
 // How twctl ends.
 enum ExitStatus : int {
   kDone = 0,
-  kRefused = 1,     // refused, not valid, or not there
+  kRefused = 1,     // refused, not valid, not there, or not to be written
   kWrongUsage = 2,  // a bad recording included
   kNoDaemon = 3,    // nobody answers
 };
