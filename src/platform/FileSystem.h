@@ -8,16 +8,20 @@
 
 namespace tonewerk {
 
-// A file open for writing. Closed by its destructor when close() was not called.
-class WritableFile {
+// A file that is being written. It is to be seen under a name once it is whole: until place() it has none
+// that others know, and one that is destroyed before leaves nothing behind.
+class NewFile {
  public:
-  virtual ~WritableFile() = default;
+  virtual ~NewFile() = default;
 
-  // All of `text`, or an error.
+  // All of `text`, or an error. After one the file can be written to, but is never whole.
   [[nodiscard]] virtual std::error_code write(std::string_view text) = 0;
 
-  // Once. Reports what the operating system only finds out at the end.
-  [[nodiscard]] virtual std::error_code close() = 0;
+  // Ends the writing: the file stands under `name` in its directory, and what was written is on the disk.
+  // Once, but again after std::errc::file_exists (something stands there, which stays as it is). Other
+  // failures: the first one of a write(), a name that createFile() would refuse, what the operating system
+  // only finds out at the end.
+  [[nodiscard]] virtual std::error_code place(const std::string& name) = 0;
 };
 
 // Any thread.
@@ -29,10 +33,11 @@ class FileSystem {
   // the process's file mode mask. No error when it exists.
   [[nodiscard]] virtual std::error_code createDirectories(const std::string& path, unsigned mode) = 0;
 
-  // Creates `name` in `directory`, or empties it, and opens it. Fails when the file would not lie directly in
-  // `directory` (a name with a slash or a zero byte, ".", "..", a symbolic link that stands there).
-  virtual std::unique_ptr<WritableFile> createFile(const std::string& directory, const std::string& name,
-                                                   std::error_code& error) = 0;
+  // A new file that is to be `name` in `directory`. Fails when it would not lie directly in `directory` (a
+  // name with a slash or a zero byte, ".", ".."), when the name is too long, and with std::errc::file_exists
+  // when something stands there (a symbolic link, too).
+  virtual std::unique_ptr<NewFile> createFile(const std::string& directory, const std::string& name,
+                                              std::error_code& error) = 0;
 
   // Whether something stands there; a symbolic link counts as what it leads to.
   virtual bool exists(const std::string& path) const = 0;

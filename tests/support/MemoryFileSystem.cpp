@@ -7,6 +7,8 @@
 namespace tonewerk {
 namespace {
 
+constexpr std::size_t kMostNameBytes = 255;
+
 bool isPlainName(std::string_view name) {
   return !name.empty() && name != "." && name != ".." && name.find('/') == std::string_view::npos &&
          name.find('\0') == std::string_view::npos;
@@ -14,39 +16,48 @@ bool isPlainName(std::string_view name) {
 
 }  // namespace
 
-class MemoryFileSystem::File final : public WritableFile {
+class MemoryFileSystem::File final : public NewFile {
  public:
-  File(std::shared_ptr<State> state, std::string path) : state_(std::move(state)), path_(std::move(path)) {}
+  File(std::shared_ptr<State> state, std::string directory)
+      : state_(std::move(state)), directory_(std::move(directory)) {}
   File(const File&) = delete;
   File& operator=(const File&) = delete;
   ~File() override {
     const std::lock_guard lock(state_->mutex);
-    if (!isClosed_) --state_->openFiles;
+    if (!isPlaced_) --state_->openFiles;
   }
 
   std::error_code write(std::string_view text) override {
     const std::lock_guard lock(state_->mutex);
-    assert(!isClosed_);
+    assert(!isPlaced_);
     if (state_->writesUntilFailure > 0 && --state_->writesUntilFailure == 0) {
+      if (!failure_) failure_ = std::make_error_code(state_->writeFailure);
       return std::make_error_code(state_->writeFailure);
     }
-    state_->files[path_] += text;
+    text_ += text;
     return {};
   }
 
-  std::error_code close() override {
+  std::error_code place(const std::string& name) override {
     const std::lock_guard lock(state_->mutex);
-    assert(!isClosed_);
-    isClosed_ = true;
+    assert(!isPlaced_);
+    if (!isPlainName(name)) return std::make_error_code(std::errc::invalid_argument);
+    if (failure_) return failure_;
+    if (state_->placeFailure != std::errc()) return std::make_error_code(state_->placeFailure);
+    const std::string path = directory_ + "/" + name;
+    if (state_->holds(path)) return std::make_error_code(std::errc::file_exists);
+    state_->files[path] = std::move(text_);
+    isPlaced_ = true;
     --state_->openFiles;
-    return state_->closeFailure == std::errc() ? std::error_code()
-                                               : std::make_error_code(state_->closeFailure);
+    return {};
   }
 
  private:
   std::shared_ptr<State> state_;
-  const std::string path_;
-  bool isClosed_ = false;
+  const std::string directory_;
+  std::string text_;
+  std::error_code failure_;
+  bool isPlaced_ = false;
 };
 
 MemoryFileSystem::MemoryFileSystem() : state_(std::make_shared<State>()) { state_->directories["/"] = 0755; }
@@ -64,10 +75,9 @@ std::error_code MemoryFileSystem::createDirectories(const std::string& path, uns
   }
 }
 
-std::unique_ptr<WritableFile> MemoryFileSystem::createFile(const std::string& directory,
-                                                           const std::string& name, std::error_code& error) {
+std::unique_ptr<NewFile> MemoryFileSystem::createFile(const std::string& directory, const std::string& name,
+                                                      std::error_code& error) {
   const std::lock_guard lock(state_->mutex);
-  const std::string path = directory + "/" + name;
   error.clear();
   if (state_->createFileFailure != std::errc()) {
     error = std::make_error_code(state_->createFileFailure);
@@ -75,20 +85,19 @@ std::unique_ptr<WritableFile> MemoryFileSystem::createFile(const std::string& di
     error = std::make_error_code(std::errc::invalid_argument);
   } else if (!state_->directories.contains(directory)) {
     error = std::make_error_code(std::errc::no_such_file_or_directory);
-  } else if (state_->links.contains(path)) {
-    error = std::make_error_code(std::errc::too_many_symbolic_link_levels);
-  } else if (state_->directories.contains(path)) {
-    error = std::make_error_code(std::errc::is_a_directory);
+  } else if (name.size() > kMostNameBytes) {
+    error = std::make_error_code(std::errc::filename_too_long);
+  } else if (state_->holds(directory + "/" + name)) {
+    error = std::make_error_code(std::errc::file_exists);
   }
   if (error) return nullptr;
-  state_->files[path].clear();
   ++state_->openFiles;
-  return std::make_unique<File>(state_, path);
+  return std::make_unique<File>(state_, directory);
 }
 
 bool MemoryFileSystem::exists(const std::string& path) const {
   const std::lock_guard lock(state_->mutex);
-  return state_->files.contains(path) || state_->directories.contains(path) || state_->links.contains(path);
+  return state_->holds(path);
 }
 
 std::error_code MemoryFileSystem::readFile(const std::string& path, std::string& text) const {
@@ -112,9 +121,7 @@ std::error_code MemoryFileSystem::moveFile(const std::string& from, const std::s
   const std::string to = directory + "/" + name;
   const bool hasPlace = state_->files.contains(from) && state_->directories.contains(directory);
   if (!hasPlace) return std::make_error_code(std::errc::no_such_file_or_directory);
-  if (state_->files.contains(to) || state_->directories.contains(to) || state_->links.contains(to)) {
-    return std::make_error_code(std::errc::file_exists);
-  }
+  if (state_->holds(to)) return std::make_error_code(std::errc::file_exists);
   auto node = state_->files.extract(from);
   node.key() = to;
   state_->files.insert(std::move(node));
@@ -137,9 +144,9 @@ void MemoryFileSystem::failWrite(int nth, std::errc error) {
   state_->writeFailure = error;
 }
 
-void MemoryFileSystem::failClose(std::errc error) {
+void MemoryFileSystem::failPlace(std::errc error) {
   const std::lock_guard lock(state_->mutex);
-  state_->closeFailure = error;
+  state_->placeFailure = error;
 }
 
 void MemoryFileSystem::failReadFile(std::errc error) {

@@ -26,8 +26,8 @@ class MemoryFileSystem final : public FileSystem {
   MemoryFileSystem();
 
   std::error_code createDirectories(const std::string& path, unsigned mode) override;
-  std::unique_ptr<WritableFile> createFile(const std::string& directory, const std::string& name,
-                                           std::error_code& error) override;
+  std::unique_ptr<NewFile> createFile(const std::string& directory, const std::string& name,
+                                      std::error_code& error) override;
   bool exists(const std::string& path) const override;
   std::error_code readFile(const std::string& path, std::string& text) const override;
   std::error_code moveFile(const std::string& from, const std::string& directory,
@@ -38,20 +38,20 @@ class MemoryFileSystem final : public FileSystem {
   void failCreateFile(std::errc error);
   // The `nth` write() from now on fails, 1 the next one; every other succeeds.
   void failWrite(int nth, std::errc error);
-  void failClose(std::errc error);
+  // Also of a file that was written as it should.
+  void failPlace(std::errc error);
   void failReadFile(std::errc error);
   void failMoveFile(std::errc error);
   // A file with this text, its directories included.
   void addFile(const std::string& path, std::string text);
-  // createFile() fails where one stands.
   void addSymbolicLink(const std::string& path);
 
-  // What was written so far; none without such a file.
+  // None without such a file; a new one is none before it is placed.
   std::optional<std::string> contents(const std::string& path) const;
   std::vector<std::string> files() const;
   // The mode that the directory was made with; none without such a directory.
   std::optional<unsigned> directoryMode(const std::string& path) const;
-  // How many files are open.
+  // How many new files have neither been placed nor given up.
   int openFiles() const;
 
  private:
@@ -64,10 +64,15 @@ class MemoryFileSystem final : public FileSystem {
     std::errc createFileFailure{};
     std::errc writeFailure{};
     int writesUntilFailure = 0;  // 0 for none
-    std::errc closeFailure{};
+    std::errc placeFailure{};
     std::errc readFailure{};
     std::errc moveFailure{};
     int openFiles = 0;
+
+    // Whether something stands there. Under the mutex.
+    bool holds(const std::string& path) const {
+      return files.contains(path) || directories.contains(path) || links.contains(path);
+    }
   };
   class File;
 

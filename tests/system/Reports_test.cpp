@@ -1,9 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // What becomes of what clients say: events in the store, and summary files.
+#include <algorithm>
 #include <chrono>
+#include <cmath>
 #include <filesystem>
 #include <fstream>
+#include <numeric>
 #include <string>
 #include <vector>
 
@@ -14,9 +17,12 @@ namespace tonewerk {
 namespace {
 
 using nlohmann::json;
+using ::testing::Contains;
 using ::testing::ElementsAre;
 using ::testing::EndsWith;
+using ::testing::HasSubstr;
 using ::testing::IsEmpty;
+using ::testing::Not;
 using ::testing::SizeIs;
 
 constexpr ReporterID kSession = 77;
@@ -37,8 +43,8 @@ class ReportsTest : public RunningDaemonTest {
     return waitUntil([&] { return recorded().named(name).size() >= count; });
   }
 
-  // The paths of all summary files.
-  std::vector<std::filesystem::path> summaryFiles() const {
+  // The paths of what lies where summary files do, sorted.
+  std::vector<std::filesystem::path> filesInReporting() const {
     std::vector<std::filesystem::path> found;
     std::error_code error;
     const std::filesystem::directory_iterator all(daemon.path(DaemonProcess::kLogs, "Audio/Reporting"),
@@ -46,18 +52,33 @@ class ReportsTest : public RunningDaemonTest {
     if (!error) {
       for (const auto& entry : all) found.push_back(entry.path());
     }
+    std::sort(found.begin(), found.end());
     return found;
   }
+  // Those of all summary files.
+  std::vector<std::filesystem::path> summaryFiles() const {
+    std::vector<std::filesystem::path> found = filesInReporting();
+    std::erase_if(found, [](const auto& path) { return path.extension() != ".json"; });
+    return found;
+  }
+  std::vector<std::filesystem::path> unfinishedFiles() const {
+    std::vector<std::filesystem::path> found = filesInReporting();
+    std::erase_if(found, [](const auto& path) { return path.extension() == ".json"; });
+    return found;
+  }
+  static json contentsOf(const std::filesystem::path& path) {
+    std::ifstream stream(path);
+    return json::parse(stream, nullptr, false);
+  }
 
-  // Waits for the one file there is to be, complete.
+  // Waits for the one file there is to be. It is whole when it is there.
   json summaryFile() const {
     json file;
     EXPECT_TRUE(waitUntil([&] {
       const auto paths = summaryFiles();
       if (paths.size() != 1) return false;
-      std::ifstream stream(paths.front());
-      file = json::parse(stream, nullptr, false);
-      return !file.is_discarded();
+      file = contentsOf(paths.front());
+      return true;
     }));
     return file;
   }
@@ -253,6 +274,80 @@ TEST_F(ReportsTest, ASummaryFileIsWrittenForATestSessionAlone) {
   EXPECT_FALSE(file.empty());
   ASSERT_THAT(summaryFiles(), SizeIs(1));
   EXPECT_THAT(summaryFiles().front().string(), EndsWith("-5-Unknown-test.json"));
+}
+
+// Stops within one second once wrote one file, the last one's.
+TEST_F(ReportsTest, StopsWithinOneSecondLeaveAWholeFileEach) {
+  constexpr int kRuns = 20;  // far fewer seconds
+  DaemonClient client = connect();
+  client.create(5, 11);
+  for (int run = 0; run < kRuns; ++run) {
+    client.start(5);
+    client.send({{"run", run}}, kPlayback, kTypeStart, {5});
+    client.stop(5);
+  }
+  ASSERT_TRUE(waitUntil([&] { return summaryFiles().size() >= kRuns; })) << summaryFiles().size();
+  std::vector<int> runs;
+  bool isAnyNumbered = false;
+  for (const auto& path : summaryFiles()) {
+    const json file = contentsOf(path);
+    ASSERT_TRUE(file.is_array()) << path;
+    for (const json& entry : file) {
+      if (entry.contains("Playback_Start_1")) runs.push_back(entry["Playback_Start_1"].at("run").get<int>());
+    }
+    isAnyNumbered = isAnyNumbered || path.string().ends_with("-5-Unknown-test-2.json");
+  }
+  std::sort(runs.begin(), runs.end());
+  std::vector<int> all(kRuns);
+  std::iota(all.begin(), all.end(), 0);
+  EXPECT_EQ(runs, all);
+  EXPECT_TRUE(isAnyNumbered);
+  EXPECT_THAT(unfinishedFiles(), IsEmpty());
+}
+
+TEST_F(ReportsTest, AnEntryThatJsonCannotSayLeavesTheFileValid) {
+  DaemonClient client = connect();
+  client.create(5, 11);
+  client.start(5);
+  client.send({{"n", 1}}, kPlayback, kTypeStart, {5});
+  client.send({{"n", std::nan("")}}, kPlayback, kTypeGeneric, {5});
+  client.send({{"n", 3}}, kPlayback, kTypeStop, {5});
+  client.stop(5);
+  const json file = summaryFile();
+  ASSERT_TRUE(file.is_array());
+  std::vector<std::string> names;
+  for (const json& entry : file) names.push_back(entry.begin().key());
+  EXPECT_THAT(names, Contains("Playback_Start_1"));
+  EXPECT_THAT(names, Contains("Playback_Stop_1"));
+  EXPECT_THAT(names, Not(Contains("Playback_Generic_1")));
+  EXPECT_THAT(textOfFile(summaryFiles().front()), HasSubstr("\n}\n\n,\n{\n"));
+  EXPECT_TRUE(waitForLogLine("dataWithJSONObject: "));
+}
+
+// Half a file under its final name was once what such a death left.
+TEST_F(ReportsTest, ADaemonThatIsKilledWhileItWritesAFileLeavesNoHalfOne) {
+  DaemonClient client = connect();
+  client.create(5, 11);
+  client.start(5);
+  std::string text(std::size_t{900} << 10, 'x');
+  for (int n = 0; n < 60; ++n) client.send({{"n", n}, {"text", text}}, kPlayback, kTypeStart, {5});
+  client.stop(5);
+  ASSERT_TRUE(waitUntil([&] {
+    const auto unfinished = unfinishedFiles();
+    std::error_code error;
+    return !unfinished.empty() && std::filesystem::file_size(unfinished.front(), error) > text.size();
+  }));
+  daemon.process().kill();
+  ASSERT_THAT(unfinishedFiles(), SizeIs(1)) << "it was not killed in the midst of it";
+  EXPECT_THAT(summaryFiles(), IsEmpty());
+
+  ASSERT_TRUE(daemon.start());
+  DaemonClient next = connect();
+  next.create(6, 11);
+  next.start(6);
+  next.stop(6);
+  EXPECT_TRUE(summaryFile().is_array());
+  EXPECT_THAT(unfinishedFiles(), IsEmpty());
 }
 
 class InternalBuildReportsTest : public ReportsTest {

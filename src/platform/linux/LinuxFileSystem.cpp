@@ -1,11 +1,15 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/LinuxFileSystem.h"
 
-#include <cassert>
 #include <cerrno>
+#include <cstdint>
 #include <fcntl.h>
+#include <filesystem>
 #include <linux/fs.h>
+#include <random>
 #include <stdio.h>
+#include <string_view>
+#include <sys/file.h>
 #include <sys/sendfile.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -18,6 +22,7 @@ namespace tonewerk {
 namespace {
 
 constexpr mode_t kFileMode = 0644;
+constexpr std::string_view kHiddenPrefix = ".new-";
 
 bool isPlainName(std::string_view name) {
   return !name.empty() && name != "." && name != ".." && name.find('/') == std::string_view::npos &&
@@ -39,44 +44,102 @@ std::error_code createDirectory(const std::string& path, mode_t mode) {
   return error == std::errc::file_exists ? std::make_error_code(std::errc::not_a_directory) : error;
 }
 
-class LinuxFile final : public WritableFile {
+std::error_code writeAll(int descriptor, std::string_view text) {
+  while (!text.empty()) {
+    const ssize_t written = ::write(descriptor, text.data(), text.size());
+    if (written >= 0) {
+      text.remove_prefix(static_cast<std::size_t>(written));
+    } else if (errno != EINTR) {
+      return lastSystemError();
+    }
+  }
+  return {};
+}
+
+// Renames without replacing anything.
+std::error_code renameToNew(int fromDirectory, const std::string& from, int directory,
+                            const std::string& name) {
+  if (renameat2(fromDirectory, from.c_str(), directory, name.c_str(), RENAME_NOREPLACE) == 0) return {};
+  return lastSystemError();
+}
+
+// What renameToNew() fails with on a file system that can only rename over others.
+constexpr std::errc kCannotKeep = std::errc::invalid_argument;
+
+std::string newHiddenName() {
+  static thread_local std::random_device random;
+  return std::string(kHiddenPrefix) + std::to_string((std::uint64_t{random()} << 32) | random());
+}
+
+class HiddenFile final : public NewFile {
  public:
-  explicit LinuxFile(int descriptor) : descriptor_(descriptor) {}
-  LinuxFile(const LinuxFile&) = delete;
-  LinuxFile& operator=(const LinuxFile&) = delete;
-  ~LinuxFile() override {
-    if (descriptor_ >= 0) ::close(descriptor_);
+  // Null with `error` when the directory takes no file.
+  static std::unique_ptr<HiddenFile> make(FileDescriptor directory, std::error_code& error) {
+    for (;;) {
+      std::string name = newHiddenName();
+      constexpr int kFlags = O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
+      FileDescriptor file(openat(directory.get(), name.c_str(), kFlags, kFileMode));
+      if (!file && errno == EEXIST) continue;
+      if (!file) {
+        error = lastSystemError();
+        return nullptr;
+      }
+      auto made = std::make_unique<HiddenFile>(std::move(directory), std::move(name), std::move(file));
+      if (made->isLocked()) return made;
+      directory = std::move(made->directory_);
+    }
+  }
+
+  HiddenFile(FileDescriptor directory, std::string name, FileDescriptor file)
+      : directory_(std::move(directory)), hiddenName_(std::move(name)), file_(std::move(file)) {}
+  HiddenFile(const HiddenFile&) = delete;
+  HiddenFile& operator=(const HiddenFile&) = delete;
+  ~HiddenFile() override {
+    if (directory_ && !hiddenName_.empty()) unlinkat(directory_.get(), hiddenName_.c_str(), 0);
   }
 
   std::error_code write(std::string_view text) override {
-    while (!text.empty()) {
-      const ssize_t written = ::write(descriptor_, text.data(), text.size());
-      if (written >= 0) {
-        text.remove_prefix(static_cast<std::size_t>(written));
-      } else if (errno != EINTR) {
-        return lastSystemError();
-      }
-    }
-    return {};
+    const std::error_code error = writeAll(file_.get(), text);
+    if (error && !failure_) failure_ = error;
+    return error;
   }
 
-  std::error_code close() override {
-    assert(descriptor_ >= 0);
-    // An interrupted close() has closed all the same.
-    const int result = ::close(std::exchange(descriptor_, -1));
-    return result == 0 || errno == EINTR ? std::error_code() : lastSystemError();
+  std::error_code place(const std::string& name) override {
+    if (!isPlainName(name)) return std::make_error_code(std::errc::invalid_argument);
+    if (failure_) return failure_;
+    // Else a crash of the system could leave the name with half of the text, or none, behind it.
+    if (fsync(file_.get()) != 0) return failure_ = lastSystemError();
+    std::error_code error = renameToNew(directory_.get(), hiddenName_, directory_.get(), name);
+    if (error == kCannotKeep) {
+      const bool isLinked =
+          linkat(directory_.get(), hiddenName_.c_str(), directory_.get(), name.c_str(), 0) == 0;
+      error = isLinked ? std::error_code() : lastSystemError();
+      if (isLinked) unlinkat(directory_.get(), hiddenName_.c_str(), 0);
+    }
+    if (!error) hiddenName_.clear();
+    return error;
   }
 
  private:
-  int descriptor_;
+  // Another process that looks for leftovers may come between the making and the locking.
+  bool isLocked() const {
+    struct stat status {};
+    return flock(file_.get(), LOCK_EX | LOCK_NB) == 0 && fstat(file_.get(), &status) == 0 &&
+           status.st_nlink > 0;
+  }
+
+  FileDescriptor directory_;
+  std::string hiddenName_;  // empty once the file has its place
+  FileDescriptor file_;
+  std::error_code failure_;
 };
 
-// Why what is open under `descriptor` cannot be written as a new file, having emptied it if it can.
-std::error_code makeEmpty(int descriptor) {
+// Whether nobody writes the file any more. Ours alone: what others put there is theirs.
+bool isLeftover(int directory, const char* name) {
+  const FileDescriptor file(openat(directory, name, O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
   struct stat status {};
-  if (fstat(descriptor, &status) != 0) return lastSystemError();
-  if (!S_ISREG(status.st_mode)) return std::make_error_code(std::errc::operation_not_permitted);
-  return ftruncate(descriptor, 0) == 0 ? std::error_code() : lastSystemError();
+  return file && fstat(file.get(), &status) == 0 && S_ISREG(status.st_mode) && status.st_uid == geteuid() &&
+         flock(file.get(), LOCK_EX | LOCK_NB) == 0;
 }
 
 std::error_code copyAll(int from, int to) {
@@ -95,9 +158,9 @@ std::error_code copyFile(const std::string& from, int directory, const std::stri
   const int descriptor =
       openat(directory, name.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, kFileMode);
   if (descriptor < 0) return lastSystemError();
-  LinuxFile copy(descriptor);
   std::error_code error = copyAll(source.get(), descriptor);
-  if (!error) error = copy.close();
+  // An interrupted close() has closed all the same.
+  if (::close(descriptor) != 0 && errno != EINTR && !error) error = lastSystemError();
   if (error) static_cast<void>(unlinkat(directory, name.c_str(), 0));
   return error;
 }
@@ -123,30 +186,38 @@ std::error_code LinuxFileSystem::createDirectories(const std::string& path, unsi
   }
 }
 
-std::unique_ptr<WritableFile> LinuxFileSystem::createFile(const std::string& directory,
-                                                          const std::string& name, std::error_code& error) {
+std::unique_ptr<NewFile> LinuxFileSystem::createFile(const std::string& directory, const std::string& name,
+                                                     std::error_code& error) {
   error.clear();
   if (!isPlainName(name)) {
     error = std::make_error_code(std::errc::invalid_argument);
     return nullptr;
   }
-  const FileDescriptor parent(open(directory.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
-  if (!parent) {
+  FileDescriptor parent(open(directory.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  struct stat status {};
+  const bool isTaken = parent && fstatat(parent.get(), name.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0;
+  if (isTaken) {
+    error = std::make_error_code(std::errc::file_exists);
+  } else if (!parent || errno != ENOENT) {
     error = lastSystemError();
-    return nullptr;
   }
-  // Emptied only once it is known to be a regular file. Non-blocking, so that a pipe in its place cannot hold
-  // us.
-  constexpr int kFlags = O_WRONLY | O_CREAT | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC;
-  const int descriptor = openat(parent.get(), name.c_str(), kFlags, kFileMode);
-  if (descriptor < 0) {
-    error = lastSystemError();
-    return nullptr;
-  }
-  auto file = std::make_unique<LinuxFile>(descriptor);
-  error = makeEmpty(descriptor);
   if (error) return nullptr;
-  return file;
+  removeLeftovers(directory, parent.get());
+  return HiddenFile::make(std::move(parent), error);
+}
+
+void LinuxFileSystem::removeLeftovers(const std::string& path, int directory) {
+  {
+    const std::lock_guard lock(mutex_);
+    if (!swept_.insert(path).second) return;
+  }
+  std::error_code error;  // a directory that cannot be read keeps what it has
+  for (std::filesystem::directory_iterator at(path, error), end; !error && at != end; at.increment(error)) {
+    const std::string name = at->path().filename().string();
+    if (name.starts_with(kHiddenPrefix) && isLeftover(directory, name.c_str())) {
+      unlinkat(directory, name.c_str(), 0);
+    }
+  }
 }
 
 bool LinuxFileSystem::exists(const std::string& path) const {
@@ -167,10 +238,8 @@ std::error_code LinuxFileSystem::moveFile(const std::string& from, const std::st
   if (!S_ISREG(status.st_mode)) return std::make_error_code(std::errc::operation_not_permitted);
   const FileDescriptor parent(open(directory.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
   if (!parent) return lastSystemError();
-  if (renameat2(AT_FDCWD, from.c_str(), parent.get(), name.c_str(), RENAME_NOREPLACE) == 0) return {};
-  const std::error_code error = lastSystemError();
-  // The second is a file system that cannot rename without replacing.
-  const bool needsCopy = error == std::errc::cross_device_link || error == std::errc::invalid_argument;
+  const std::error_code error = renameToNew(AT_FDCWD, from, parent.get(), name);
+  const bool needsCopy = error == std::errc::cross_device_link || error == kCannotKeep;
   return needsCopy ? copyAndRemove(from, parent.get(), name) : error;
 }
 

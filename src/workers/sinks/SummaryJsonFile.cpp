@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "workers/sinks/SummaryJsonFile.h"
 
+#include <cassert>
+#include <string_view>
 #include <system_error>
 #include <utility>
 
@@ -14,11 +16,20 @@ namespace tonewerk {
 namespace {
 
 constexpr unsigned kDirectoryMode = 0777;
+constexpr std::string_view kExtension = ".json";
+
+std::string numbered(const std::string& name, std::size_t number) {
+  if (number == 1) return name;
+  return name.substr(0, name.size() - kExtension.size()) + "-" + std::to_string(number) +
+         std::string(kExtension);
+}
 
 }  // namespace
 
 SummaryJsonFile::SummaryJsonFile(std::string directory, std::string name)
-    : directory_(std::move(directory)), name_(std::move(name)) {}
+    : directory_(std::move(directory)), name_(std::move(name)) {
+  assert(name_.ends_with(kExtension));
+}
 
 SummaryJsonFile::~SummaryJsonFile() = default;
 
@@ -28,9 +39,11 @@ void SummaryJsonFile::openFile() {
     errorLog(TWReportingSummaryLogCategory(), "can't create logging directory at %@: %@", directory_,
              error.message());
   }
-  reportPath_ = directory_ + "/" + name_;
-  std::error_code error;
-  reportFileHandle_ = files.createFile(directory_, name_, error);
+  const std::error_code error = withFreeName([&](const std::string& name) {
+    std::error_code problem;
+    reportFileHandle_ = files.createFile(directory_, name, problem);
+    return problem;
+  });
   if (reportFileHandle_ == nullptr) {
     errorLog(TWReportingSummaryLogCategory(),
              "SummaryJsonFileWorker failed to open file. action=open file=%@ error=\"%@\"", reportPath_,
@@ -42,10 +55,20 @@ void SummaryJsonFile::openFile() {
   writeLine("[");
 }
 
+std::error_code SummaryJsonFile::withFreeName(
+    const std::function<std::error_code(const std::string& name)>& attempt) {
+  for (;; ++nameNumber_) {
+    const std::string name = numbered(name_, nameNumber_);
+    reportPath_ = directory_ + "/" + name;
+    const std::error_code error = attempt(name);
+    if (error != std::errc::file_exists) return error;
+  }
+}
+
 void SummaryJsonFile::writeLine(std::string_view text) {
   if (reportFileHandle_ == nullptr) return;
   // Only the line's end is looked at: a disk that refuses the text refuses that too, and is then reported
-  // once.
+  // once. What is missing keeps the file from appearing, which is said at its end.
   static_cast<void>(reportFileHandle_->write(text));
   if (const std::error_code error = reportFileHandle_->write("\n")) {
     errorLog(TWReportingSummaryLogCategory(),
@@ -56,24 +79,28 @@ void SummaryJsonFile::writeLine(std::string_view text) {
 
 void SummaryJsonFile::writeMessage(AudioEventCategory category, AudioEventType type,
                                    const ValueMap& payload) {
-  if (reportPath_.empty()) {
-    openFile();
-  } else {
-    writeLine(",");
-  }
+  if (reportPath_.empty()) openFile();
   std::string member = TWReportingUtilityCategoryString(category) + "_" + TWReportingUtilityTypeString(type);
   const std::size_t count = ++counts_[member];
   member += "_" + std::to_string(count);
   std::string problem;
   const auto text =
       TWReportingContext::current().platform().json.pretty(ValueMap{{member, payload}}, problem);
-  if (!text) errorLog(TWReportingSummaryLogCategory(), "dataWithJSONObject: %@", problem);
-  writeLine(text.value_or(""));
+  if (!text) {
+    errorLog(TWReportingSummaryLogCategory(), "dataWithJSONObject: %@", problem);
+    writeLine("");  // where the entry would be: the array goes on without it
+    return;
+  }
+  if (std::exchange(hasEntry_, true)) writeLine(",");
+  writeLine(*text);
 }
 
 void SummaryJsonFile::closeFile() {
   writeLine("]");
-  const std::error_code error = reportFileHandle_ == nullptr ? std::error_code() : reportFileHandle_->close();
+  std::error_code error;
+  if (reportFileHandle_ != nullptr) {
+    error = withFreeName([this](const std::string& name) { return reportFileHandle_->place(name); });
+  }
   if (error) {
     errorLog(TWReportingSummaryLogCategory(),
              "SummaryJsonFileWorker failed to closed file. action=close file=%@ error=\"%@\"", reportPath_,

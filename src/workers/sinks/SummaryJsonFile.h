@@ -1,9 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <functional>
 #include <memory>
 #include <string>
 #include <string_view>
+#include <system_error>
 #include <unordered_map>
 
 #include "session/AudioEvent.h"
@@ -11,7 +13,7 @@
 
 namespace tonewerk {
 
-class WritableFile;
+class NewFile;
 
 // One JSON summary file: an array written line by line, an object of one member a message.
 //
@@ -23,10 +25,14 @@ class WritableFile;
 //   ...
 //   ]
 //
+// It appears under its name when it is whole, never before; where the name is taken it gets "-2", "-3" ...
+// before ".json". A message that JSON cannot say leaves an empty line and the array around it valid; a file
+// that could not be written to its end does not appear.
+//
 // Failures are logged and never stop the rest. One thread at a time.
 class SummaryJsonFile {
  public:
-  // The file is made in `directory`, which is made too, at the first message.
+  // The file is made in `directory`, which is made too, at the first message. `name` ends with ".json".
   SummaryJsonFile(std::string directory, std::string name);
   ~SummaryJsonFile();
 
@@ -38,12 +44,16 @@ class SummaryJsonFile {
 
  private:
   void openFile();
+  // Goes on to the next name while the attempt says that it is taken; the last attempt's error.
+  std::error_code withFreeName(const std::function<std::error_code(const std::string& name)>& attempt);
   void writeLine(std::string_view text);
 
   const std::string directory_;
   const std::string name_;
+  std::size_t nameNumber_ = 1;
   std::string reportPath_;  // empty until the first message
-  std::unique_ptr<WritableFile> reportFileHandle_;
+  std::unique_ptr<NewFile> reportFileHandle_;
+  bool hasEntry_ = false;  // one with a text
   std::unordered_map<std::string, std::size_t> counts_;
 };
 

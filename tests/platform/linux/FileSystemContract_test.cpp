@@ -1,17 +1,27 @@
 // SPDX-License-Identifier: Apache-2.0
+#include <algorithm>
+#include <csignal>
 #include <filesystem>
 #include <fstream>
-#include <gtest/gtest.h>
+#include <gmock/gmock.h>
 #include <sstream>
+#include <string>
 #include <sys/stat.h>
+#include <sys/wait.h>
 #include <unistd.h>
+#include <vector>
 
 #include "platform/linux/LinuxFileSystem.h"
 #include "support/MemoryFileSystem.h"
+#include "support/SmallFileSystem.h"
 #include "support/TemporaryDirectory.h"
 
 namespace tonewerk {
 namespace {
+
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+using ::testing::StartsWith;
 
 struct OnDisk {
   TemporaryDirectory directory;
@@ -48,8 +58,15 @@ class FileSystemContract : public testing::Test {
  protected:
   FileSystemContract() : error_(kind_.files.createDirectories(path("d"), 0755)) { EXPECT_FALSE(error_); }
   std::string path(const std::string& name) const { return kind_.root() + "/" + name; }
-  std::unique_ptr<WritableFile> create(const std::string& name) {
+  std::unique_ptr<NewFile> create(const std::string& name) {
     return kind_.files.createFile(path("d"), name, error_);
+  }
+  // A whole file with this text.
+  void add(const std::string& name, const std::string& text) {
+    const auto file = create(name);
+    ASSERT_NE(file, nullptr) << error_.message();
+    EXPECT_FALSE(file->write(text));
+    EXPECT_FALSE(file->place(name));
   }
 
   Kind kind_;
@@ -59,49 +76,84 @@ class FileSystemContract : public testing::Test {
 using Kinds = testing::Types<OnDisk, InMemory>;
 TYPED_TEST_SUITE(FileSystemContract, Kinds);
 
-TYPED_TEST(FileSystemContract, WritesAFile) {
+TYPED_TEST(FileSystemContract, AFileIsThereWhenItIsPlacedAndNotBefore) {
   const auto file = this->create("name.json");
   ASSERT_NE(file, nullptr);
   EXPECT_FALSE(this->error_);
   EXPECT_FALSE(file->write("one "));
   EXPECT_FALSE(file->write(""));
   EXPECT_FALSE(file->write("two"));
-  EXPECT_FALSE(file->close());
+  EXPECT_FALSE(this->kind_.files.exists(this->path("d/name.json")));
+  EXPECT_FALSE(file->place("name.json"));
   EXPECT_EQ(this->kind_.contents(this->path("d/name.json")), "one two");
 }
 
-TYPED_TEST(FileSystemContract, EmptiesAFileThatIsThere) {
-  for (const char* text : {"a long text", "short"}) {
-    const auto file = this->create("name");
-    EXPECT_FALSE(file->write(text));
-    EXPECT_FALSE(file->close());
-  }
-  EXPECT_EQ(this->kind_.contents(this->path("d/name")), "short");
+TYPED_TEST(FileSystemContract, AFileThatIsNotPlacedLeavesNothing) {
+  EXPECT_FALSE(this->create("name")->write("x"));
+  EXPECT_FALSE(this->kind_.files.exists(this->path("d/name")));
 }
 
-TYPED_TEST(FileSystemContract, AFileThatIsNotClosedKeepsWhatWasWritten) {
-  EXPECT_FALSE(this->create("name")->write("x"));
-  EXPECT_EQ(this->kind_.contents(this->path("d/name")), "x");
+TYPED_TEST(FileSystemContract, APlacedFileOutlivesItsWriter) {
+  this->add("name", "text");
+  EXPECT_EQ(this->kind_.contents(this->path("d/name")), "text");
+}
+
+TYPED_TEST(FileSystemContract, ATakenNameIsRefusedAndWhatStandsThereStays) {
+  this->add("name", "old");
+  EXPECT_EQ(this->create("name"), nullptr);
+  EXPECT_EQ(this->error_, std::errc::file_exists);
+  EXPECT_EQ(this->kind_.contents(this->path("d/name")), "old");
+}
+
+TYPED_TEST(FileSystemContract, ANameThatIsTakenWhileTheFileIsWrittenIsRefusedAndAnotherMayBeTried) {
+  const auto file = this->create("name");
+  EXPECT_FALSE(file->write("new"));
+  this->add("name", "faster");
+  EXPECT_EQ(file->place("name"), std::errc::file_exists);
+  EXPECT_FALSE(file->place("another"));
+  EXPECT_EQ(this->kind_.contents(this->path("d/name")), "faster");
+  EXPECT_EQ(this->kind_.contents(this->path("d/another")), "new");
+}
+
+TYPED_TEST(FileSystemContract, TwoFilesMayBeWrittenAtOnce) {
+  const auto first = this->create("first");
+  const auto second = this->create("second");
+  EXPECT_FALSE(first->write("1"));
+  EXPECT_FALSE(second->write("2"));
+  EXPECT_FALSE(second->place("second"));
+  EXPECT_FALSE(first->place("first"));
+  EXPECT_EQ(this->kind_.contents(this->path("d/first")), "1");
+  EXPECT_EQ(this->kind_.contents(this->path("d/second")), "2");
 }
 
 TYPED_TEST(FileSystemContract, NamesThatWouldLeaveTheDirectoryAreRefused) {
+  const auto file = this->create("good");
   for (const std::string& name : {std::string(""), std::string("."), std::string(".."), std::string("../x"),
                                   std::string("a/b"), std::string("/x"), std::string("a\0b", 3)}) {
     EXPECT_EQ(this->create(name), nullptr);
     EXPECT_EQ(this->error_, std::errc::invalid_argument);
+    EXPECT_EQ(file->place(name), std::errc::invalid_argument);
   }
+}
+
+TYPED_TEST(FileSystemContract, ANameThatIsTooLongIsRefusedBeforeAnythingIsWritten) {
+  this->add(std::string(255, 'a'), "text");
+  EXPECT_EQ(this->create(std::string(256, 'a')), nullptr);
+  EXPECT_EQ(this->error_, std::errc::filename_too_long);
 }
 
 TYPED_TEST(FileSystemContract, ASymbolicLinkIsNotFollowed) {
   this->kind_.addSymbolicLink(this->path("d/link"));
   EXPECT_EQ(this->create("link"), nullptr);
-  EXPECT_EQ(this->error_, std::errc::too_many_symbolic_link_levels);
+  EXPECT_EQ(this->error_, std::errc::file_exists);
+  const auto file = this->create("free");
+  EXPECT_EQ(file->place("link"), std::errc::file_exists);
 }
 
 TYPED_TEST(FileSystemContract, ADirectoryIsNoFile) {
   EXPECT_FALSE(this->kind_.files.createDirectories(this->path("d/inner"), 0755));
   EXPECT_EQ(this->create("inner"), nullptr);
-  EXPECT_EQ(this->error_, std::errc::is_a_directory);
+  EXPECT_EQ(this->error_, std::errc::file_exists);
 }
 
 TYPED_TEST(FileSystemContract, AFileNeedsItsDirectory) {
@@ -122,7 +174,7 @@ TYPED_TEST(FileSystemContract, DirectoriesGetExactlyTheirMode) {
 }
 
 TYPED_TEST(FileSystemContract, AFileInTheWayOfADirectoryIsAnError) {
-  EXPECT_FALSE(this->create("file")->close());
+  this->add("file", "");
   EXPECT_EQ(this->kind_.files.createDirectories(this->path("d/file"), 0755), std::errc::not_a_directory);
   EXPECT_EQ(this->kind_.files.createDirectories(this->path("d/file/below"), 0755),
             std::errc::not_a_directory);
@@ -131,16 +183,13 @@ TYPED_TEST(FileSystemContract, AFileInTheWayOfADirectoryIsAnError) {
 TYPED_TEST(FileSystemContract, KnowsWhatStandsWhere) {
   EXPECT_TRUE(this->kind_.files.exists(this->path("d")));
   EXPECT_FALSE(this->kind_.files.exists(this->path("d/file")));
-  EXPECT_FALSE(this->create("file")->close());
+  this->add("file", "");
   EXPECT_TRUE(this->kind_.files.exists(this->path("d/file")));
   EXPECT_FALSE(this->kind_.files.exists(""));
 }
 
 TYPED_TEST(FileSystemContract, ReadsAWholeFile) {
-  {
-    const auto file = this->create("file");
-    EXPECT_FALSE(file->write(std::string("one\0two", 7)));
-  }
+  this->add("file", std::string("one\0two", 7));
   std::string text;
   EXPECT_FALSE(this->kind_.files.readFile(this->path("d/file"), text));
   EXPECT_EQ(text, std::string("one\0two", 7));
@@ -150,22 +199,22 @@ TYPED_TEST(FileSystemContract, ReadsAWholeFile) {
 
 TYPED_TEST(FileSystemContract, MovesAFileToAnotherDirectory) {
   EXPECT_FALSE(this->kind_.files.createDirectories(this->path("e"), 0755));
-  EXPECT_FALSE(this->create("file")->write("text"));
+  this->add("file", "text");
   EXPECT_FALSE(this->kind_.files.moveFile(this->path("d/file"), this->path("e"), "new"));
   EXPECT_FALSE(this->kind_.files.exists(this->path("d/file")));
   EXPECT_EQ(this->kind_.contents(this->path("e/new")), "text");
 }
 
 TYPED_TEST(FileSystemContract, AMoveReplacesNothing) {
-  EXPECT_FALSE(this->create("from")->write("new"));
-  EXPECT_FALSE(this->create("to")->write("old"));
+  this->add("from", "new");
+  this->add("to", "old");
   EXPECT_EQ(this->kind_.files.moveFile(this->path("d/from"), this->path("d"), "to"), std::errc::file_exists);
   EXPECT_EQ(this->kind_.contents(this->path("d/from")), "new");
   EXPECT_EQ(this->kind_.contents(this->path("d/to")), "old");
 }
 
 TYPED_TEST(FileSystemContract, AMoveDoesNotLeaveItsDirectory) {
-  EXPECT_FALSE(this->create("from")->write("new"));
+  this->add("from", "new");
   for (const char* name : {"", ".", "..", "../x", "a/b"}) {
     EXPECT_EQ(this->kind_.files.moveFile(this->path("d/from"), this->path("d"), name),
               std::errc::invalid_argument);
@@ -175,7 +224,7 @@ TYPED_TEST(FileSystemContract, AMoveDoesNotLeaveItsDirectory) {
 TYPED_TEST(FileSystemContract, AMoveNeedsItsFileAndItsDirectory) {
   EXPECT_EQ(this->kind_.files.moveFile(this->path("d/none"), this->path("d"), "to"),
             std::errc::no_such_file_or_directory);
-  EXPECT_FALSE(this->create("from")->write("new"));
+  this->add("from", "new");
   EXPECT_EQ(this->kind_.files.moveFile(this->path("d/from"), this->path("none"), "to"),
             std::errc::no_such_file_or_directory);
   EXPECT_EQ(this->kind_.contents(this->path("d/from")), "new");
@@ -227,7 +276,86 @@ TEST(LinuxFileSystemTest, APipeInTheFilesPlaceNeitherBlocksNorIsWritten) {
   ASSERT_EQ(mkfifo(directory.path("pipe").c_str(), 0600), 0);
   std::error_code error;
   EXPECT_EQ(LinuxFileSystem().createFile(directory.path(), "pipe", error), nullptr);
-  EXPECT_TRUE(error);
+  EXPECT_EQ(error, std::errc::file_exists);
+}
+
+// The names in a directory, hidden ones included.
+std::vector<std::string> namesIn(const std::string& directory) {
+  std::vector<std::string> names;
+  for (const auto& entry : std::filesystem::directory_iterator(directory)) {
+    names.push_back(entry.path().filename().string());
+  }
+  std::sort(names.begin(), names.end());
+  return names;
+}
+
+TEST(LinuxFileSystemTest, AFileThatIsBeingWrittenIsHiddenAndGoesWithItsWriter) {
+  const TemporaryDirectory directory;
+  LinuxFileSystem files;
+  std::error_code error;
+  auto file = files.createFile(directory.path(), "a.json", error);
+  ASSERT_NE(file, nullptr);
+  EXPECT_THAT(namesIn(directory.path()), ElementsAre(StartsWith(".new-")));
+  file.reset();
+  EXPECT_THAT(namesIn(directory.path()), IsEmpty());
+}
+
+// A process that writes a file and is killed.
+void beKilledWhileWriting(const std::string& directory) {
+  const pid_t child = fork();
+  if (child == 0) {
+    std::error_code error;
+    LinuxFileSystem files;
+    const auto file = files.createFile(directory, "a.json", error);
+    if (file != nullptr) static_cast<void>(file->write("half"));
+    raise(SIGKILL);
+  }
+  int status = 0;
+  ASSERT_EQ(waitpid(child, &status, 0), child);
+  ASSERT_TRUE(WIFSIGNALED(status));
+}
+
+TEST(LinuxFileSystemTest, WhatAKilledProcessWasWritingIsRemovedWithTheNextFile) {
+  const TemporaryDirectory directory;
+  beKilledWhileWriting(directory.path());
+  beKilledWhileWriting(directory.path());
+  EXPECT_THAT(namesIn(directory.path()), ElementsAre(StartsWith(".new-")));
+  LinuxFileSystem files;
+  std::error_code error;
+  const auto file = files.createFile(directory.path(), "a.json", error);
+  ASSERT_NE(file, nullptr);
+  EXPECT_FALSE(file->place("a.json"));
+  EXPECT_THAT(namesIn(directory.path()), ElementsAre("a.json"));
+}
+
+TEST(LinuxFileSystemTest, WhatOthersAreWritingOrIsNoLeftoverStays) {
+  const TemporaryDirectory directory;
+  LinuxFileSystem other;
+  std::error_code error;
+  const auto written = other.createFile(directory.path(), "b.json", error);
+  ASSERT_NE(written, nullptr);
+  std::ofstream(directory.path("new-1")) << "no hidden name";
+  std::filesystem::create_directory(directory.path(".new-folder"));
+  std::filesystem::create_symlink(directory.path("new-1"), directory.path(".new-link"));
+  LinuxFileSystem files;
+  const auto file = files.createFile(directory.path(), "a.json", error);
+  ASSERT_NE(file, nullptr);
+  EXPECT_FALSE(file->place("a.json"));
+  EXPECT_FALSE(written->write("text"));
+  EXPECT_FALSE(written->place("b.json"));
+  EXPECT_THAT(namesIn(directory.path()),
+              ElementsAre(".new-folder", ".new-link", "a.json", "b.json", "new-1"));
+}
+
+TEST(LinuxFileSystemTest, AnotherUsersFileStays) {
+  if (geteuid() != 0) GTEST_SKIP() << "only root can give a file to somebody else";
+  const TemporaryDirectory directory;
+  std::ofstream(directory.path(".new-1")) << "another user's";
+  ASSERT_EQ(chown(directory.path(".new-1").c_str(), 1, 1), 0);
+  LinuxFileSystem files;
+  std::error_code error;
+  EXPECT_NE(files.createFile(directory.path(), "a.json", error), nullptr);
+  EXPECT_THAT(namesIn(directory.path()), ElementsAre(".new-1"));
 }
 
 TEST(LinuxFileSystemTest, ATrailingSlashDoesNoHarm) {
@@ -239,25 +367,43 @@ TEST(LinuxFileSystemTest, ATrailingSlashDoesNoHarm) {
 TEST(LinuxFileSystemTest, ADeviceIsNotWritten) {
   std::error_code error;
   EXPECT_EQ(LinuxFileSystem().createFile("/dev", "null", error), nullptr);
-  EXPECT_EQ(error, std::errc::operation_not_permitted);
+  EXPECT_EQ(error, std::errc::file_exists);
 }
 
 TEST(MemoryFileSystemTest, FailsOnDemand) {
   MemoryFileSystem files;
   std::error_code error;
   files.failWrite(2, std::errc::no_space_on_device);
-  files.failClose(std::errc::io_error);
-  const auto file = files.createFile("/", "x", error);
-  ASSERT_NE(file, nullptr);
-  EXPECT_FALSE(file->write("a"));
-  EXPECT_EQ(file->write("b"), std::errc::no_space_on_device);
-  EXPECT_FALSE(file->write("c"));
-  EXPECT_EQ(files.openFiles(), 1);
-  EXPECT_EQ(file->close(), std::errc::io_error);
+  {
+    const auto file = files.createFile("/", "x", error);
+    ASSERT_NE(file, nullptr);
+    EXPECT_FALSE(file->write("a"));
+    EXPECT_EQ(file->write("b"), std::errc::no_space_on_device);
+    EXPECT_FALSE(file->write("c"));
+    EXPECT_EQ(file->place("x"), std::errc::no_space_on_device);  // not whole
+    EXPECT_EQ(files.openFiles(), 1);
+  }
   EXPECT_EQ(files.openFiles(), 0);
+  files.failPlace(std::errc::io_error);
+  EXPECT_EQ(files.createFile("/", "x", error)->place("x"), std::errc::io_error);
+  EXPECT_THAT(files.files(), IsEmpty());
   files.failCreateFile(std::errc::permission_denied);
   EXPECT_EQ(files.createFile("/", "y", error), nullptr);
   EXPECT_EQ(error, std::errc::permission_denied);
+}
+
+TEST(LinuxFileSystemTest, AFileThatFindsNoRoomIsNotPlaced) {
+  const TemporaryDirectory directory;
+  const SmallFileSystem small(directory.path());
+  if (!small.isMounted()) GTEST_SKIP() << "only root can make a file system";
+  LinuxFileSystem files;
+  std::error_code error;
+  auto file = files.createFile(directory.path(), "a.json", error);
+  ASSERT_NE(file, nullptr);
+  EXPECT_EQ(file->write(std::string(std::size_t{2} << 20, 'x')), std::errc::no_space_on_device);
+  EXPECT_EQ(file->place("a.json"), std::errc::no_space_on_device);
+  file.reset();
+  EXPECT_THAT(namesIn(directory.path()), IsEmpty());
 }
 
 }  // namespace

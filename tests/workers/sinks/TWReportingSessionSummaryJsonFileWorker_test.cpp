@@ -11,11 +11,14 @@
 namespace tonewerk {
 namespace {
 
+using ::testing::Contains;
 using ::testing::ElementsAre;
 using ::testing::HasSubstr;
 using ::testing::IsEmpty;
+using ::testing::Not;
 using ::testing::SizeIs;
 using ::testing::StartsWith;
+using ::testing::UnorderedElementsAre;
 
 constexpr char kDirectory[] = "/logs/Audio/Reporting";
 constexpr char kPath[] = "/logs/Audio/Reporting/20251120-111800+0100-77-Unknown-test.json";
@@ -176,6 +179,22 @@ TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, EachStopWritesAFileOfItsOwn)
   EXPECT_THAT(test.files.files(), SizeIs(2));
 }
 
+// The second once took the place of the first.
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, StopsWithinOneSecondWriteFilesWithNumbers) {
+  for (const char* run : {"first", "second", "third"}) {
+    session->start();
+    send({{"run", run}});
+    stop();
+  }
+  const std::string stem = std::string(kPath).substr(0, std::string(kPath).size() - 5);
+  EXPECT_THAT(test.files.files(), UnorderedElementsAre(kPath, stem + "-2.json", stem + "-3.json"));
+  EXPECT_THAT(test.files.contents(kPath).value(), HasSubstr("\"first\""));
+  EXPECT_THAT(test.files.contents(stem + "-2.json").value(), HasSubstr("\"second\""));
+  EXPECT_THAT(test.files.contents(stem + "-3.json").value(), HasSubstr("\"third\""));
+  EXPECT_THAT(test.log.textsOf("twru", LogLevel::kInfo),
+              Contains("SummaryJsonFileWorker closed file. action=close file=" + stem + "-3.json"));
+}
+
 // A producer that leaves only redundant messages behind.
 class RedundantOnly final : public TWReportingSessionWorkerProducerProtocol {
  public:
@@ -238,29 +257,44 @@ TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, AFileThatCannotBeOpenedIsLog
   EXPECT_THAT(test.files.files(), ElementsAre(kPath));
 }
 
-TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, OnlyAFailedLineEndIsReported) {
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, OfALineOnlyAFailedEndIsReported) {
+  const std::string line =
+      "SummaryJsonFileWorker failed to write line. action=writeline file=" + std::string(kPath);
   test.files.failWrite(1, std::errc::no_space_on_device);  // the text of the first line
   session->start();
   stop();
-  EXPECT_THAT(test.log.textsOf("twru", LogLevel::kError), IsEmpty());
+  EXPECT_THAT(test.log.textsOf("twru", LogLevel::kError), Not(Contains(StartsWith(line))));
 
   test.files.failWrite(2, std::errc::no_space_on_device);  // its end
   session->start();
   stop();
   EXPECT_THAT(
       test.log.textsOf("twru", LogLevel::kError),
-      ElementsAre("SummaryJsonFileWorker failed to write line. action=writeline file=" + std::string(kPath) +
-                  " error=\"" + std::make_error_code(std::errc::no_space_on_device).message() + "\""));
+      Contains(line + " error=\"" + std::make_error_code(std::errc::no_space_on_device).message() + "\""));
+}
+
+// Half a file under the final name was once what a full disk left.
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, AFileThatIsNotWholeDoesNotAppearAndItsClosingSaysWhy) {
+  for (const int nth : {1, 2, 5}) {
+    test.files.failWrite(nth, std::errc::no_space_on_device);
+    session->start();
+    stop();
+    EXPECT_THAT(test.files.files(), IsEmpty());
+    EXPECT_EQ(test.log.textsOf("twru", LogLevel::kError).back(),
+              "SummaryJsonFileWorker failed to closed file. action=close file=" + std::string(kPath) +
+                  " error=\"" + std::make_error_code(std::errc::no_space_on_device).message() + "\"");
+  }
 }
 
 TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, AFailedCloseIsLogged) {
-  test.files.failClose(std::errc::io_error);
+  test.files.failPlace(std::errc::io_error);
   session->start();
   stop();
   EXPECT_THAT(
       test.log.textsOf("twru", LogLevel::kError),
       ElementsAre("SummaryJsonFileWorker failed to closed file. action=close file=" + std::string(kPath) +
                   " error=\"" + std::make_error_code(std::errc::io_error).message() + "\""));
+  EXPECT_EQ(test.files.openFiles(), 0);
 }
 
 TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, APayloadThatJsonCannotSayLeavesAnEmptyEntryAndIsLogged) {
@@ -268,7 +302,8 @@ TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, APayloadThatJsonCannotSayLea
   send({{"bad", std::nan("")}});
   stop();
   EXPECT_THAT(test.log.textsOf("twru", LogLevel::kError), ElementsAre(StartsWith("dataWithJSONObject: ")));
-  EXPECT_THAT(test.files.contents(kPath).value(), HasSubstr("\n,\n\n]\n"));
+  EXPECT_THAT(test.files.contents(kPath).value(), HasSubstr("}\n\n]\n"));
+  EXPECT_THAT(memberNames(), ElementsAre("Setup_Start_1", "Setup_Stop_1"));
 }
 
 TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, TheFileIsWrittenOffTheWorkQueue) {
