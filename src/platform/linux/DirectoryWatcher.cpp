@@ -22,7 +22,7 @@
 namespace tonewerk {
 namespace {
 
-constexpr std::uint32_t kFileEvents = IN_CLOSE_WRITE | IN_MOVED_TO | IN_CREATE;
+constexpr std::uint32_t kFileEvents = IN_CLOSE | IN_MOVED_TO | IN_CREATE | IN_OPEN | IN_MODIFY;
 constexpr std::uint32_t kSelfEvents = IN_DELETE_SELF | IN_MOVE_SELF;
 constexpr std::uint32_t kEntryEvents = IN_CREATE | IN_MOVED_TO | IN_MOVED_FROM | IN_DELETE;
 
@@ -69,20 +69,24 @@ void DirectoryWatcher::run() {
   nameThisThread("tonewerk.watch");
   for (;;) {
     std::array<pollfd, 2> waited = {pollfd{stop_.get(), POLLIN, 0}, pollfd{inotify_.get(), POLLIN, 0}};
-    const int timeout = mustRetry_ ? static_cast<int>(nextRetry().count()) : -1;
-    const int ready = poll(waited.data(), waited.size(), timeout);
+    const bool mayHaveLinks = !unopened_.empty();
+    const int ready = poll(waited.data(), waited.size(), patience());
     if (waited[0].revents != 0) return;
-    if (ready == 0) {
+    if (ready > 0) {
+      readEvents();
+    } else if (ready == 0 && mayHaveLinks) {
+      tellOfLinks();
+    } else if (ready == 0) {
       attach();
       if (directoryWatch_ >= 0) onEverything_();
-    } else if (ready > 0) {
-      readEvents();
     }
   }
 }
 
-std::chrono::milliseconds DirectoryWatcher::nextRetry() {
-  return std::exchange(retry_, std::min(2 * retry_, kLastRetry));
+int DirectoryWatcher::patience() {
+  if (!unopened_.empty()) return 0;
+  if (!mustRetry_) return -1;
+  return static_cast<int>(std::exchange(retry_, std::min(2 * retry_, kLastRetry)).count());
 }
 
 void DirectoryWatcher::readEvents() {
@@ -111,10 +115,29 @@ void DirectoryWatcher::handle(const Event& event) {
     onEverything_();
     return;
   }
-  if (isParent || (event.what & IN_ISDIR) != 0) return;
-  const bool isMerelyCreated = (event.what & (IN_CLOSE_WRITE | IN_MOVED_TO)) == 0;
-  if (isMerelyCreated && !holdsSomething(directory_ + "/" + std::string(event.name))) return;
-  onFile_(event.name);
+  if (!isParent && (event.what & IN_ISDIR) == 0) handleFile(event);
+}
+
+void DirectoryWatcher::handleFile(const Event& event) {
+  const std::string name(event.name);
+  if ((event.what & IN_CREATE) != 0) {
+    opened_.erase(name);  // another file's
+    if (holdsSomething(directory_ + "/" + name)) unopened_.insert(name);
+  } else if ((event.what & IN_OPEN) != 0) {
+    if (unopened_.erase(name) > 0) opened_.insert(name);
+  } else if ((event.what & IN_CLOSE_NOWRITE) != 0) {
+    if (opened_.erase(name) > 0) unopened_.insert(name);
+  } else {
+    unopened_.erase(name);
+    opened_.erase(name);
+    if ((event.what & IN_MODIFY) == 0) onFile_(name);  // the others end a writing, or a move
+  }
+}
+
+void DirectoryWatcher::tellOfLinks() {
+  for (const std::string& name : std::exchange(unopened_, {})) {
+    if (holdsSomething(directory_ + "/" + name)) onFile_(name);
+  }
 }
 
 int DirectoryWatcher::watch(const std::string& path, std::uint32_t events, int& failure) {
@@ -128,6 +151,8 @@ void DirectoryWatcher::attach() {
   for (const int old : {directoryWatch_, parentWatch_}) {
     if (old >= 0) inotify_rm_watch(inotify_.get(), old);
   }
+  unopened_.clear();
+  opened_.clear();
   // The parent first, so that a directory which comes between the two is seen.
   int parentFailure = 0;
   int failure = 0;

@@ -3,6 +3,7 @@
 
 #include <chrono>
 #include <functional>
+#include <set>
 #include <string>
 #include <string_view>
 #include <thread>
@@ -16,12 +17,14 @@ namespace tonewerk {
 //
 //   closed after writing, renamed into place        -> onFile(name)
 //   linked into place: there and not empty          -> onFile(name)
-//   created, not yet closed                         -> nothing
+//   created, not yet closed after writing           -> nothing
 //   the kernel's event queue overflowed             -> onEverything()
 //   the directory came, or another took its place   -> onEverything()
 //
-// The kernel tells a link like a creation, so that a file which somebody has created and written to, but not
-// closed yet, may be told of early; it is told of again when it is closed.
+// The kernel tells a link like a creation. What tells them apart is that a file which somebody creates has
+// been opened before anything can be in it. So one that is not empty when its coming is read is a link if the
+// kernel has nothing more to say of it, or nothing but that it was opened and closed unwritten. Else it will
+// be closed after writing, and told of then.
 //
 // The directory is known by its path. It need not be there: its parent is watched for its coming. Where
 // neither is, or where watching fails, it is tried again at intervals that grow from a second to a minute.
@@ -51,11 +54,15 @@ class DirectoryWatcher {
   // Reads what the kernel has gathered.
   void readEvents();
   void handle(const Event& event);
+  void handleFile(const Event& event);
+  // Those that nobody has open, when the kernel has nothing more to say.
+  void tellOfLinks();
   // Watches what the paths lead to now, instead of what they led to before.
   void attach();
   int watch(const std::string& path, std::uint32_t events, int& failure);
   void noteProblem(int failure);
-  std::chrono::milliseconds nextRetry();
+  // How long poll() may wait, in milliseconds; -1 for ever.
+  int patience();
 
   const std::string directory_;
   const std::string parent_;
@@ -69,6 +76,9 @@ class DirectoryWatcher {
   // The watcher's thread, after the constructor.
   int directoryWatch_ = -1;
   int parentWatch_ = -1;
+  // Files that came and were not empty, while it is not known whether they were linked or are being written.
+  std::set<std::string, std::less<>> unopened_;  // nobody has them open, as far as the kernel has said
+  std::set<std::string, std::less<>> opened_;    // somebody has
   bool mustRetry_ = false;
   int problem_ = 0;  // the one last logged
   std::chrono::milliseconds retry_ = kFirstRetry;
