@@ -5,25 +5,11 @@
 #include <cstring>
 #include <limits>
 #include <new>
-#include <random>
+
+#include "values/Mix.h"
 
 namespace tonewerk {
 namespace {
-
-std::uint64_t processSeed() {
-  static const std::uint64_t seed = [] {
-    std::random_device device;
-    return (static_cast<std::uint64_t>(device()) << 32) | device();
-  }();
-  return seed;
-}
-
-// Multiplies to 128 bits and folds: every bit of both factors reaches every bit of the result.
-std::uint64_t mix(std::uint64_t a, std::uint64_t b) {
-  __extension__ using Product = unsigned __int128;
-  const Product product = static_cast<Product>(a) * b;
-  return static_cast<std::uint64_t>(product) ^ static_cast<std::uint64_t>(product >> 64);
-}
 
 std::uint64_t wordAt(const char* at) {
   std::uint64_t word = 0;
@@ -50,7 +36,7 @@ std::uint64_t lastWord(std::string_view text, std::size_t count) {
 }  // namespace
 
 std::size_t SharedString::hashOf(std::string_view text) {
-  static const std::uint64_t seed = processSeed();
+  static const std::uint64_t seed = randomKey();
   constexpr std::uint64_t kOdd = 0x9E3779B97F4A7C15U;
   std::uint64_t hash = mix(seed ^ text.size(), kOdd);
   const char* at = text.data();

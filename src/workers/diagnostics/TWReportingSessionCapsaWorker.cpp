@@ -99,25 +99,24 @@ bool TWReportingSessionCapsaWorker::handleMessage(const TWReportingSessionMessag
   const auto owner = session.lock();
   if (owner == nullptr || message.message.empty()) return false;
   for (const auto& instance : instances_) {
-    if (message.message == instance->workerState().lastMessage) continue;
-    if (!instance->interestedInMessage(message)) continue;
-    countAndMaybeFire(*instance, message, *owner);
+    if (instance->interestedInMessage(message)) countUnlessRepeated(*instance, message, *owner);
   }
   return false;
 }
 
-void TWReportingSessionCapsaWorker::countAndMaybeFire(TWReportingSessionCapsaWorkerInstance& instance,
-                                                      const TWReportingSessionMessage& message,
-                                                      const TWReportingSession& owner) {
+void TWReportingSessionCapsaWorker::countUnlessRepeated(TWReportingSessionCapsaWorkerInstance& instance,
+                                                        const TWReportingSessionMessage& message,
+                                                        const TWReportingSession& owner) {
+  WorkerInstanceState& state = instance.workerState();
+  const ValueDigest payload = ValueDigest::of(message.message);
+  if (payload == state.lastMessage) return;
   debugLog(TWReportingCapsaLogCategory(), "Interested in message. instance=%@, %@", instance.instanceClass(),
            message);
-  WorkerInstanceState& state = instance.workerState();
   const double now = TWReportingContext::current().platform().clock.now();
   ++state.interestedCount;
   if (!state.interestFirstSeen) state.interestFirstSeen = Date{now};
   instance.handleMessage(message);
-  state.lastMessage.reset();
-  if (message.message.bytes() <= kMostRememberedBytes) state.lastMessage = message.message;
+  state.lastMessage = payload;
 
   const bool isOften = state.interestThresholdCount <= state.interestedCount;
   const bool isLong = now - state.interestFirstSeen->seconds > state.interestThresholdDurationSeconds;

@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <cstddef>
 #include <memory>
 #include <optional>
 #include <string>
@@ -18,9 +17,6 @@ namespace tonewerk {
 // them. On internal builds only.
 class TWReportingSessionCapsaWorker final : public TWReportingSessionWorkerConsumerProtocol {
  public:
-  // A larger payload is not remembered, so its repeats count: a client may have thousands of sessions.
-  static constexpr std::size_t kMostRememberedBytes = std::size_t{64} << 10;
-
   static const TWReportingSessionWorkerClass kWorkerClass;
   const TWReportingSessionWorkerClass& workerClass() const override { return kWorkerClass; }
   static constexpr bool handleSingleMessageSession() { return true; }
@@ -52,8 +48,9 @@ class TWReportingSessionCapsaWorker final : public TWReportingSessionWorkerConsu
                                                  FaultsignReporter& symptomReporter);
 
  private:
-  static void countAndMaybeFire(TWReportingSessionCapsaWorkerInstance& instance,
-                                const TWReportingSessionMessage& message, const TWReportingSession& owner);
+  // And fires when it is enough. A repeat is one of the last interesting message's payload.
+  static void countUnlessRepeated(TWReportingSessionCapsaWorkerInstance& instance,
+                                  const TWReportingSessionMessage& message, const TWReportingSession& owner);
   static void fire(TWReportingSessionCapsaWorkerInstance& instance, const TWReportingSessionMessage& message,
                    const TWReportingSession& owner);
 

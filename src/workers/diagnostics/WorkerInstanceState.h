@@ -8,7 +8,8 @@
 #include <string>
 
 #include "platform/FaultsignReporter.h"
-#include "values/Value.h"
+#include "values/Date.h"
+#include "values/ValueDigest.h"
 
 namespace tonewerk {
 
@@ -25,8 +26,9 @@ struct WorkerInstanceState {
 
   bool oncePerSession = false;
   std::int64_t firedCount = 0;
-  // The payload of the last interesting message since the counting began.
-  std::optional<ValueMap> lastMessage;
+  // Of the payload of the last interesting message since the counting began. A digest, since a client may
+  // have thousands of sessions and payloads of any size.
+  std::optional<ValueDigest> lastMessage;
   // The one that the last firing used.
   std::unique_ptr<FaultsignReporter> symptomReporter;
 };

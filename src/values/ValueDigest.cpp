@@ -1,0 +1,137 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "values/ValueDigest.h"
+
+#include <algorithm>
+#include <bit>
+#include <cmath>
+#include <cstring>
+#include <string_view>
+
+#include "values/Mix.h"
+#include "values/Value.h"
+
+namespace tonewerk {
+namespace {
+
+constexpr double kTwoTo63 = 9223372036854775808.0;
+constexpr double kTwoTo64 = 18446744073709551616.0;
+
+// What a word that follows means: values of different kinds never begin alike.
+enum class Tag : std::uint64_t { kNegative = 1, kWhole, kFraction, kNan, kDate, kString, kArray, kMap };
+
+// Of this process. Factors that are odd lose nothing of the other one.
+struct Keys {
+  ValueDigest start{randomKey(), randomKey()};
+  ValueDigest factor{randomKey() | 1, randomKey() | 1};
+};
+
+const Keys& keys() {
+  static const Keys drawn;
+  return drawn;
+}
+
+// Takes words in order. The two halves know nothing of each other's keys.
+class Digester {
+ public:
+  void add(std::uint64_t word) {
+    state_.first = mix(state_.first ^ word, keys().factor.first);
+    state_.second = mix(state_.second ^ word, keys().factor.second);
+  }
+  void add(Tag tag) { add(static_cast<std::uint64_t>(tag)); }
+  void add(const Value& value);
+  void add(const ValueMap& map);
+
+  const ValueDigest& state() const { return state_; }
+
+ private:
+  void addText(std::string_view text);
+  void addWhole(std::int64_t number);
+  void addNumber(double number);
+  void addInstant(Date date);
+
+  ValueDigest state_ = keys().start;
+};
+
+void Digester::addText(std::string_view text) {
+  add(text.size());
+  while (!text.empty()) {
+    std::uint64_t word = 0;
+    const std::size_t count = std::min(text.size(), sizeof(word));
+    std::memcpy(&word, text.data(), count);
+    add(word);
+    text.remove_prefix(count);
+  }
+}
+
+void Digester::addWhole(std::int64_t number) {
+  add(number < 0 ? Tag::kNegative : Tag::kWhole);
+  add(static_cast<std::uint64_t>(number));
+}
+
+// A double without a fraction equals the integer, where there is one.
+void Digester::addNumber(double number) {
+  if (std::isnan(number)) return add(Tag::kNan);
+  if (std::trunc(number) == number && number >= -kTwoTo63 && number < kTwoTo63) {
+    return addWhole(static_cast<std::int64_t>(number));
+  }
+  const bool isUnsigned = std::trunc(number) == number && number > 0.0 && number < kTwoTo64;
+  add(isUnsigned ? Tag::kWhole : Tag::kFraction);
+  add(isUnsigned ? static_cast<std::uint64_t>(number) : std::bit_cast<std::uint64_t>(number));
+}
+
+void Digester::addInstant(Date date) {
+  add(Tag::kDate);
+  addNumber(date.seconds);
+}
+
+// Whatever the order: entries are digested each for itself and added up.
+void Digester::add(const ValueMap& map) {
+  ValueDigest sum;
+  for (const ValueMapEntry& entry : map) {
+    Digester one;
+    one.addText(entry.key.view());
+    one.add(entry.value);
+    sum.first += one.state().first;
+    sum.second += one.state().second;
+  }
+  add(Tag::kMap);
+  add(map.size());
+  add(sum.first);
+  add(sum.second);
+}
+
+void Digester::add(const Value& value) {
+  switch (value.kind()) {
+    case Value::Kind::kBoolean:
+      return addWhole(*value.asBoolean() ? 1 : 0);
+    case Value::Kind::kInteger:
+      return addWhole(*value.asInteger());
+    case Value::Kind::kUnsigned:
+      add(Tag::kWhole);
+      return add(*value.asUnsigned());
+    case Value::Kind::kDouble:
+      return addNumber(*value.asDouble());
+    case Value::Kind::kString:
+      add(Tag::kString);
+      return addText(value.asString()->view());
+    case Value::Kind::kDate:
+      return addInstant(*value.asDate());
+    case Value::Kind::kArray:
+      add(Tag::kArray);
+      add(value.asArray()->size());
+      for (const Value& element : *value.asArray()) add(element);
+      return;
+    case Value::Kind::kMap:
+      return add(*value.asMap());
+  }
+}
+
+}  // namespace
+
+ValueDigest ValueDigest::of(const ValueMap& map) {
+  Digester digester;
+  digester.add(map);
+  return digester.state();
+}
+
+}  // namespace tonewerk
