@@ -44,12 +44,24 @@ struct TestPlatform {
   TestPlatform(const TestPlatform&) = delete;
   TestPlatform& operator=(const TestPlatform&) = delete;
 
-  Platform platform() { return platformWith(log, tracePoints, clock, queues, metricon, linkReport); }
+  Platform platform() { return platformWith(capsa); }
+
+  // The same with another capture service.
+  Platform platformWith(Capsa& otherCapsa) {
+    return platformWith(log, tracePoints, clock, queues, metricon, linkReport, otherCapsa);
+  }
 
   // The same with other services in place of those that messages use, for benchmarks.
   Platform platformWith(Log& otherLog, TracePoints& otherTracePoints, Clock& otherClock,
                         SerialQueueFactory& otherQueues, Metricon& otherMetricon,
                         LinkReport& otherLinkReport) {
+    return platformWith(otherLog, otherTracePoints, otherClock, otherQueues, otherMetricon, otherLinkReport,
+                        capsa);
+  }
+
+  Platform platformWith(Log& otherLog, TracePoints& otherTracePoints, Clock& otherClock,
+                        SerialQueueFactory& otherQueues, Metricon& otherMetricon, LinkReport& otherLinkReport,
+                        Capsa& otherCapsa) {
     return {.log = otherLog,
             .tracePoints = otherTracePoints,
             .clock = otherClock,
@@ -67,7 +79,7 @@ struct TestPlatform {
             .energybook = energybook,
             .diagwire = diagwire,
             .linkReport = otherLinkReport,
-            .capsa = capsa,
+            .capsa = otherCapsa,
             .runtrace = runtrace,
             .kolvi = kolvi,
             .benchfile = benchfile,

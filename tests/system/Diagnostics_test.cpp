@@ -1,7 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // What the daemon of an internal build leaves on the disk when a recording shows it signs of trouble.
+#include <chrono>
 #include <filesystem>
+#include <functional>
 #include <nlohmann/json.hpp>
 #include <string>
 #include <vector>
@@ -19,6 +21,7 @@ using ::testing::HasSubstr;
 using ::testing::IsEmpty;
 using ::testing::SizeIs;
 using ::testing::StartsWith;
+using ::testing::UnorderedElementsAre;
 
 class DiagnosticsTest : public DaemonTest {
  protected:
@@ -103,6 +106,74 @@ TEST_F(DiagnosticsTest, TheExampleProvokesADraftAStallTraceAndAMemoryLog) {
 
   // Their symptoms did not last.
   EXPECT_THAT(listed("captures"), IsEmpty());
+}
+
+// Sources of captures, by the daemon's own clock: it takes 77 seconds.
+class CaptureSourcesTest : public DiagnosticsTest {
+ protected:
+  static constexpr ReporterID kHeard = 1;
+  static constexpr ReporterID kUnheard = 2;
+  static constexpr ReporterID kMusic = 3;
+
+  // Each differs from the one before.
+  void soundQuietly(DaemonClient& client, ReporterID alarm) {
+    client.send({{"issue_type", "LowRMS"}, {"n", ++sent}}, kCategoryError, kTypeIssueDetector, {alarm});
+  }
+  void leakHaptics(DaemonClient& client) {
+    client.send({{"Haptic_Active_Hardware_Time_Seconds", ++sent}}, kCategoryGeneric, kTypeEnergybook,
+                {kMusic});
+  }
+  // Repeats the symptom every second until the log says `line`.
+  bool keepOnUntil(const std::string& line, const std::function<void()>& symptom) const {
+    auto next = std::chrono::steady_clock::now();
+    return waitUntil(
+        [&] {
+          if (logLinesWith(line) > 0) return true;
+          if (std::chrono::steady_clock::now() < next) return false;
+          symptom();
+          next += std::chrono::seconds(1);
+          return false;
+        },
+        kLongPatience);
+  }
+
+  static constexpr std::chrono::seconds kLongPatience{90};
+  int sent = 0;
+};
+
+TEST_F(CaptureSourcesTest, OfSeveralSourcesOneIsCancelledAndTheOthersAreCaptured) {
+  configure("InternalBuild = true\nHapticLeakCapture = true\n");
+  ASSERT_TRUE(daemon.start());
+  DaemonClient alarms = connect();
+  DaemonClient player = connect();
+  for (const ReporterID alarm : {kHeard, kUnheard}) {
+    alarms.create(alarm, kServiceAlarms);
+    alarms.start(alarm);
+    soundQuietly(alarms, alarm);
+    soundQuietly(alarms, alarm);
+  }
+  player.create(kMusic, 7);
+  player.start(kMusic);
+  leakHaptics(player);
+
+  constexpr char kAccepted[] = "Parameters to Capsa session for alarm Low RMS accepted.";
+  ASSERT_TRUE(keepOnUntil(kAccepted, [&] { soundQuietly(alarms, kHeard); })) << daemon.log();
+  alarms.stop(kHeard);
+  ASSERT_TRUE(waitForLogLine("capture cancelled. sessionId="));
+  // A cancelled one keeps nobody from being captured.
+  soundQuietly(alarms, kUnheard);
+  ASSERT_TRUE(waitUntil([&] { return logLinesWith(kAccepted) == 2; })) << daemon.log();
+  ASSERT_TRUE(keepOnUntil("Started Capsa session for haptics leaks.", [&] { leakHaptics(player); }));
+
+  ASSERT_TRUE(waitUntil([&] { return listed("captures").size() == 2; }, kLongPatience)) << daemon.log();
+  EXPECT_EQ(logLinesWith("kFaultsignErrorRequestThrottled"), 0U);
+  std::vector<std::string> services;
+  for (const auto& entry :
+       std::filesystem::directory_iterator(daemon.path(DaemonProcess::kState, "captures"))) {
+    const json request = json::parse(textOfFile(entry.path() / "request.json"), nullptr, false);
+    services.push_back(request.at("signature").at("type"));
+  }
+  EXPECT_THAT(services, UnorderedElementsAre("alarms", "longformaudio"));
 }
 
 TEST_F(DiagnosticsTest, TheBackOffOfDraftsSurvivesARestart) {

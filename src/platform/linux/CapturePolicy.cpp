@@ -25,10 +25,16 @@ FaultsignError CapturePolicy::judge(const FaultsignSignature& signature, double 
   return kFaultsignErrorNone;
 }
 
-void CapturePolicy::accept(const FaultsignSignature& signature) {
+CapturePolicy::Acceptance CapturePolicy::accept(const FaultsignSignature& signature) {
   beginDay();
   ++count_.accepted;
-  accepted_[keyOf(signature)] = clock_.monotonic();
+  return accepted_[keyOf(signature)] = clock_.monotonic();
+}
+
+// Of one that waited long, a later one of its signature may have been accepted meanwhile: that one stands.
+void CapturePolicy::withdraw(const FaultsignSignature& signature, Acceptance acceptance) {
+  const auto found = accepted_.find(keyOf(signature));
+  if (found != accepted_.end() && found->second == acceptance) accepted_.erase(found);
 }
 
 bool CapturePolicy::isValid(const FaultsignSignature& signature, double duration) {

@@ -19,9 +19,8 @@ class CapturePolicy {
  public:
   // Accepted in one day of UTC, captures that were cancelled later included.
   static constexpr std::int64_t kMostADay = 20;
-  // Between two of one signature, from acceptance to acceptance: one symptom alone takes an hour and a half
-  // to use up the day's captures.
-  static constexpr std::chrono::minutes kMinimumInterval{5};
+  // Between two of one signature, from acceptance to acceptance. One that was cancelled puts nothing off.
+  static constexpr std::chrono::seconds kMinimumInterval{60};
   // Of a session, seconds.
   static constexpr double kLongestDuration = 86'400.0;
 
@@ -44,8 +43,13 @@ class CapturePolicy {
   //   RequestThrottled     by the monotonic clock
   FaultsignError judge(const FaultsignSignature& signature, double duration);
 
+  // When it was, by the monotonic clock.
+  using Acceptance = std::chrono::nanoseconds;
+
   // One that was judged so is being made.
-  void accept(const FaultsignSignature& signature);
+  Acceptance accept(const FaultsignSignature& signature);
+  // It is not made after all: the next of its signature does not have to wait for it. The day's number stays.
+  void withdraw(const FaultsignSignature& signature, Acceptance acceptance);
 
   const Count& count() const { return count_; }
 
@@ -57,7 +61,7 @@ class CapturePolicy {
 
   const Clock& clock_;
   Count count_;
-  std::map<std::string, std::chrono::nanoseconds> accepted_;  // monotonic, within the last interval only
+  std::map<std::string, Acceptance> accepted_;  // within the last interval only
 };
 
 }  // namespace tonewerk

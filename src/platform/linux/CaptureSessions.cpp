@@ -42,13 +42,13 @@ CaptureSessions::Outcome CaptureSessions::start(const CaptureRequest& request) {
   if (isFinished_) return {kFaultsignErrorServiceUnavailable};
   if (const FaultsignError error = policy_.judge(request.signature, request.duration)) return {error};
   if (pending_.size() >= kMostPending) return {kFaultsignErrorServiceUnavailable};
-  policy_.accept(request.signature);
+  const CapturePolicy::Acceptance acceptance = policy_.accept(request.signature);
   std::string identifier = identifiers_.next(clock_.now());
   // The tick waits for the lock, so it finds what is being put here.
   auto timer = timers_.repeat(intervalOf(request.duration), [weak = weak_from_this(), identifier] {
     if (const auto self = weak.lock()) self->fire(identifier);
   });
-  pending_.emplace(identifier, Pending{request, std::move(timer)});
+  pending_.emplace(identifier, Pending{request, acceptance, std::move(timer)});
   return {kFaultsignErrorNone, std::move(identifier)};
 }
 
@@ -63,7 +63,11 @@ void CaptureSessions::fire(const std::string& identifier) {
 
 bool CaptureSessions::cancel(const std::string& identifier) {
   const std::lock_guard lock(mutex_);
-  return pending_.erase(identifier) > 0;
+  const auto found = pending_.find(identifier);
+  if (found == pending_.end()) return false;
+  policy_.withdraw(found->second.request.signature, found->second.acceptance);
+  pending_.erase(found);
+  return true;
 }
 
 std::vector<std::string> CaptureSessions::finish() {

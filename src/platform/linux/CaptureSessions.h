@@ -38,7 +38,9 @@ struct CaptureRequest {
 // Any thread. Whoever has a reference may use it, also after finish().
 class CaptureSessions : public std::enable_shared_from_this<CaptureSessions> {
  public:
-  static constexpr std::size_t kMostPending = 16;
+  // As many as two days' captures, which is what the longest duration can bring together: the day's number is
+  // what a symptom meets, not this.
+  static constexpr std::size_t kMostPending = 2 * CapturePolicy::kMostADay;
 
   // Makes the capture; false when there is no room for it. On any thread; never waits and never comes back
   // here.
@@ -73,6 +75,7 @@ class CaptureSessions : public std::enable_shared_from_this<CaptureSessions> {
  private:
   struct Pending {
     CaptureRequest request;
+    CapturePolicy::Acceptance acceptance;
     std::unique_ptr<Timer> timer;
   };
 

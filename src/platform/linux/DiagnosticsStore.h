@@ -47,7 +47,8 @@ class DiagnosticsStore {
   static constexpr std::string_view kMaxItemsKey = "max_items";
 
   struct Limits {
-    std::size_t pendingItems = 16;
+    // More than the capture service can find due at one moment.
+    std::size_t pendingItems = 48;
     std::size_t pendingBytes = std::size_t{16} << 20;  // of requests; an item that is alone always fits
     CollectorRunner::Limits collectors = {};
   };

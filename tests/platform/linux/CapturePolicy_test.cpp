@@ -81,6 +81,10 @@ TEST_F(CapturePolicyTest, CountsNothingThatItRefuses) {
 
 // The interval.
 
+TEST_F(CapturePolicyTest, TheIntervalIsAMinute) {
+  EXPECT_EQ(CapturePolicy::kMinimumInterval, std::chrono::seconds(60));
+}
+
 TEST_F(CapturePolicyTest, TakesTheSameAgainAfterTheIntervalAndNotBefore) {
   EXPECT_EQ(ask(1), kFaultsignErrorNone);
   clock.advance(CapturePolicy::kMinimumInterval - std::chrono::nanoseconds(1));
@@ -91,9 +95,9 @@ TEST_F(CapturePolicyTest, TakesTheSameAgainAfterTheIntervalAndNotBefore) {
 
 TEST_F(CapturePolicyTest, ARefusalDoesNotPutTheNextOff) {
   ask(1);
-  clock.advance(std::chrono::minutes(4));
+  clock.advance(std::chrono::seconds(40));
   EXPECT_EQ(ask(1), kFaultsignErrorRequestThrottled);
-  clock.advance(std::chrono::minutes(1));
+  clock.advance(std::chrono::seconds(20));
   EXPECT_EQ(ask(1), kFaultsignErrorNone);
 }
 
@@ -118,6 +122,32 @@ TEST_F(CapturePolicyTest, EveryPartOfASignatureTellsItFromOthers) {
   EXPECT_EQ(ask({"a", "bc", "d", "", "e", std::nullopt}), kFaultsignErrorNone);
   EXPECT_EQ(ask({"a", "b", "cd", "", "e", std::nullopt}), kFaultsignErrorNone);
   EXPECT_EQ(ask({"a", "b", "c", "d", "e", ValueMap{{"level", 1}}}), kFaultsignErrorRequestThrottled);
+}
+
+TEST_F(CapturePolicyTest, OneThatIsWithdrawnPutsNothingOffAndCountsForTheDay) {
+  const FaultsignSignature signature = signatureOf("alarms");
+  const CapturePolicy::Acceptance acceptance = policy.accept(signature);
+  EXPECT_EQ(policy.judge(signature, 0.0), kFaultsignErrorRequestThrottled);
+  policy.withdraw(signature, acceptance);
+  EXPECT_EQ(ask(signature), kFaultsignErrorNone);
+  EXPECT_EQ(policy.count().accepted, 2);
+}
+
+TEST_F(CapturePolicyTest, OneThatIsWithdrawnLateLeavesTheNewerOneOfItsSignature) {
+  const FaultsignSignature signature = signatureOf("alarms");
+  const CapturePolicy::Acceptance older = policy.accept(signature);
+  clock.advance(CapturePolicy::kMinimumInterval);
+  EXPECT_EQ(ask(signature), kFaultsignErrorNone);
+  policy.withdraw(signature, older);
+  EXPECT_EQ(ask(signature), kFaultsignErrorRequestThrottled);
+}
+
+TEST_F(CapturePolicyTest, WithdrawingLeavesOtherSignaturesAlone) {
+  const CapturePolicy::Acceptance acceptance = policy.accept(signatureOf("alarms"));
+  EXPECT_EQ(ask(signatureOf("music")), kFaultsignErrorNone);
+  policy.withdraw(signatureOf("alarms"), acceptance);
+  policy.withdraw(signatureOf("never accepted"), acceptance);
+  EXPECT_EQ(ask(signatureOf("music")), kFaultsignErrorRequestThrottled);
 }
 
 // Parameters.

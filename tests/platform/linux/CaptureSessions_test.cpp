@@ -104,16 +104,27 @@ TEST_F(CaptureSessionsTest, OnlyWhatIsPendingCanBeCancelled) {
   EXPECT_THAT(made, SizeIs(2));
 }
 
+// Sixteen were once too few for the day's twenty.
+TEST_F(CaptureSessionsTest, ADaysCapturesMayAllBePending) {
+  for (int n = 0; n < CapturePolicy::kMostADay; ++n) EXPECT_EQ(start(60.0).error, kFaultsignErrorNone) << n;
+  EXPECT_EQ(start(60.0).error, kFaultsignErrorDailyLimitExceeded);
+  clock.advance(60.0);
+  EXPECT_THAT(made, SizeIs(20));
+}
+
 TEST_F(CaptureSessionsTest, SoManyMayBePendingAndNoMoreUntilOneIsGone) {
   std::string first;
   for (std::size_t n = 0; n < CaptureSessions::kMostPending; ++n) {
+    // Another day by the wall clock, to which it jumped.
+    if (n > 0 && n % CapturePolicy::kMostADay == 0) clock.setNow(clock.now() + 86'400.0);
     const CaptureSessions::Outcome outcome = start(60.0);
     EXPECT_EQ(outcome.error, kFaultsignErrorNone);
     if (n == 0) first = outcome.identifier;
   }
+  clock.setNow(clock.now() + 86'400.0);
   EXPECT_EQ(start(60.0).error, kFaultsignErrorServiceUnavailable);
-  EXPECT_EQ(sessions->count().accepted, 16);  // what found no place does not count
   EXPECT_EQ(snapshot().error, kFaultsignErrorNone);
+  EXPECT_EQ(sessions->count().accepted, 1);  // what found no place does not count
   EXPECT_TRUE(sessions->cancel(first));
   EXPECT_EQ(start(60.0).error, kFaultsignErrorNone);
 }
@@ -129,11 +140,19 @@ TEST_F(CaptureSessionsTest, WhatThePolicyRefusesIsNeitherMadeNorPending) {
   EXPECT_THAT(made, IsEmpty());
 }
 
-TEST_F(CaptureSessionsTest, ACancelledOneCountsForTheDayAndTheInterval) {
+TEST_F(CaptureSessionsTest, ACancelledOneCountsForTheDayAndNotForTheInterval) {
   const CaptureSessions::Outcome outcome = sessions->start(requestOf("a", 60.0));
-  sessions->cancel(outcome.identifier);
+  EXPECT_TRUE(sessions->cancel(outcome.identifier));
   EXPECT_EQ(sessions->count().accepted, 1);
-  EXPECT_EQ(sessions->start(requestOf("a", 60.0)).error, kFaultsignErrorRequestThrottled);
+  EXPECT_EQ(sessions->start(requestOf("a", 60.0)).error, kFaultsignErrorNone);
+  EXPECT_EQ(sessions->count().accepted, 2);
+}
+
+TEST_F(CaptureSessionsTest, CancellingWhatIsMadeAlreadyDoesNotLetTheSameInSooner) {
+  const std::string due = sessions->start(requestOf("a", 1.0)).identifier;
+  clock.advance(1.0);
+  EXPECT_FALSE(sessions->cancel(due));
+  EXPECT_EQ(sessions->start(requestOf("a", 1.0)).error, kFaultsignErrorRequestThrottled);
 }
 
 TEST_F(CaptureSessionsTest, ACaptureThatFindsNoRoomDoesNotCount) {
