@@ -193,6 +193,7 @@ void TWReportingClientServerInstance::stopReportingSessionForID(ReporterID repor
       session->transactionCompleteBlock = nullptr;
       delegate.logReportingSessions();
     } else {
+      if (session != nullptr) session->logUnkeptMessages();
       debugLog(category(),
                "Stop called, but session==nil or session.started==false. reporterID=%lli session=%@ "
                "session.started=%i",

@@ -51,6 +51,7 @@ TWReportingSession::TWReportingSession(Private, ReporterID reporterID, ProcessId
       serviceName_(TWReportingUtilityGenerateServiceNameFromServiceType(kServiceUnknown)) {}
 
 TWReportingSession::~TWReportingSession() {
+  logUnkeptMessages();
   emitTracePoint(TWReportingTracePoint::kSessionReleased);
   infoLog(TWReportingSessionCategory(), "deallocing this session %lli", reporterID_);
   budget_->give(messageBytes_ + configuration_.bytes() + previousValues_.bytes());
@@ -172,8 +173,8 @@ void TWReportingSession::sendMessage(const std::shared_ptr<TWReportingSessionMes
       "TWReportingSessionWorker action=sendMessage reporterID=%lli app=%@ redundant=%@ message=%@",
       reporterID_, [&] { return TWReportingUtilityRetrieveAppName(configuration_).string(); },
       yesOrNo(message->isRedundant), *message);
-  if (!mergeWithinBudget(previousValues_, message->message)) noteUnkept();
-  if (!message->isRedundant) store(message);
+  addPreviousValues(message->message);
+  if (!message->isRedundant && !store(message)) ++unkeptMessageCount_;
   deliver(*message);
   if (reply) reply(std::nullopt);
 }
@@ -196,7 +197,7 @@ void TWReportingSession::deliver(const TWReportingSessionMessage& message) {
 void TWReportingSession::stop() {
   store(lifecycleMessage(kTypeStop, "stop"));
   debugLog(TWReportingSessionCategory(), "stop called. reporterID=%lli", reporterID_);
-  if (!started_) return;
+  if (!started_) return logUnkeptMessages();
   debugLog(TWReportingSessionCategory(), "ending session. reporterID=%lli", reporterID_);
   emitTracePoint(TWReportingTracePoint::kSessionEnding);
   TWReportingSessionMessage::sortMessages(messages_);
@@ -210,6 +211,7 @@ void TWReportingSession::stop() {
     debugLog(TWReportingSessionCategory(), "TWReportingSessionWorker action=stop worker=%@ reporterID=%lli",
              worker->workerClass(), reporterID_);
   }
+  logUnkeptMessages();
   forgetMessages();
   totalMessageCount_ = 0;
   redundantMessageCount_ = 0;
@@ -231,15 +233,16 @@ std::shared_ptr<TWReportingSessionMessage> TWReportingSession::lifecycleMessage(
   return message;
 }
 
-void TWReportingSession::store(const std::shared_ptr<TWReportingSessionMessage>& message) {
+bool TWReportingSession::store(const std::shared_ptr<TWReportingSessionMessage>& message) {
   const std::size_t bytes = kRecordBytes + message->message.bytes();
   if (!budget_->take(bytes)) {
-    noteUnkept();
-    return;
+    sayOnceThatNoMoreIsKept();
+    return false;
   }
   messageBytes_ += bytes;
   messages_.push_back(message);
   rememberAsNewest(*message);
+  return true;
 }
 
 void TWReportingSession::rememberAsNewest(const TWReportingSessionMessage& message) {
@@ -256,8 +259,7 @@ bool TWReportingSession::mergeWithinBudget(ValueMap& map, const ValueMap& more) 
   return true;
 }
 
-void TWReportingSession::noteUnkept() {
-  ++unkeptMessageCount_;
+void TWReportingSession::sayOnceThatNoMoreIsKept() {
   if (!budget_->isFirstRefusal()) return;
   errorLog(
       TWReportingSessionCategory(),
@@ -266,12 +268,13 @@ void TWReportingSession::noteUnkept() {
       budget_->used(), budget_->most(), reporterID_);
 }
 
+void TWReportingSession::logUnkeptMessages() {
+  if (unkeptMessageCount_ == 0) return;
+  errorLog(TWReportingSessionCategory(), "messages delivered but not kept: count=%lu reporterID=%lli",
+           std::exchange(unkeptMessageCount_, 0), reporterID_);
+}
+
 void TWReportingSession::forgetMessages() {
-  if (unkeptMessageCount_ > 0) {
-    errorLog(TWReportingSessionCategory(), "messages delivered but not kept: count=%lu reporterID=%lli",
-             unkeptMessageCount_, reporterID_);
-    unkeptMessageCount_ = 0;
-  }
   newest_.clear();
   messages_.clear();
   messages_.shrink_to_fit();
@@ -350,7 +353,7 @@ ValueMap TWReportingSession::previousValues() const {
 }
 
 void TWReportingSession::addPreviousValues(const ValueMap& values) {
-  if (!mergeWithinBudget(previousValues_, values)) noteUnkept();
+  if (!mergeWithinBudget(previousValues_, values)) sayOnceThatNoMoreIsKept();
 }
 
 TWReportingSession::Workers TWReportingSession::messageWorkers() const {

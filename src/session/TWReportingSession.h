@@ -62,6 +62,10 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   void startWorkersFromClasses(const std::vector<const TWReportingSessionWorkerClass*>& classes);
   void stop();
 
+  // Says how many messages were delivered but not kept, when there were some since this was last said. stop()
+  // and the session's end say it themselves.
+  void logUnkeptMessages();
+
   using MessageReply = std::function<void(const std::optional<ReplyError>& error)>;
   // Normalises, judges, stores and delivers the message, then replies without an error. The record becomes
   // the session's.
@@ -125,11 +129,12 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   void startWorker(TWReportingSessionWorkerProtocol& worker);
   Workers workersInOrder(Order order) const;
   void deliver(const TWReportingSessionMessage& message);
-  void store(const std::shared_ptr<TWReportingSessionMessage>& message);
+  // False when there is no room left to keep it.
+  bool store(const std::shared_ptr<TWReportingSessionMessage>& message);
   void rememberAsNewest(const TWReportingSessionMessage& message);
   // Adds `more` to `map` when the budget has room for it.
   bool mergeWithinBudget(ValueMap& map, const ValueMap& more);
-  void noteUnkept();
+  void sayOnceThatNoMoreIsKept();
   void forgetMessages();
 
   const ReporterID reporterID_;
@@ -148,7 +153,7 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   // able to choose colliding ones.
   std::map<std::pair<AudioEventCategory, AudioEventType>, const TWReportingSessionMessage*> newest_;
   std::size_t messageBytes_ = 0;          // taken from the budget for messages_
-  std::uint64_t unkeptMessageCount_ = 0;  // since the last stop
+  std::uint64_t unkeptMessageCount_ = 0;  // delivered, for want of room not stored, and not yet said
   std::vector<Consumer> consumers_;       // consumingMessageWorkers_ under their consumer face
 
   // Written on the work queue, under this lock; read there without, elsewhere with it.

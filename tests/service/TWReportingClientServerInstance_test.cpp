@@ -195,6 +195,63 @@ TEST_F(RequestTest, AConfigurationPastTheBudgetIsRefusedAndChangesNothing) {
   EXPECT_EQ(sessionOf(0, 77)->serviceType(), 65535);
 }
 
+// What is not kept.
+
+class FullBudgetTest : public RequestTest {
+ protected:
+  // Leaves room for less than a megabyte.
+  FullBudgetTest() {
+    create(*client, 70);
+    ValueMap configuration;
+    for (int n = 0; n < 255; ++n) configuration.set(std::to_string(n), megabyte);
+    EXPECT_EQ(askOnce(*client, "setConfiguration", {configuration, 70}), Value(true));
+  }
+
+  // A session that was never started and got a message that is not kept.
+  void createOverBudget(ReporterID reporterID) {
+    create(*client, reporterID);
+    send({{"text", megabyte}}, Value(ValueArray{reporterID}));
+    EXPECT_THAT(sessionOf(0, reporterID)->messages(), IsEmpty());
+  }
+
+  std::vector<std::string> counted() {
+    std::vector<std::string> lines = test.log.textsOf("twrr", LogLevel::kError);
+    std::erase_if(lines, [](const std::string& line) { return !line.starts_with("messages delivered"); });
+    test.log.clear();
+    return lines;
+  }
+
+  static std::string unkept(ReporterID reporterID) {
+    return "messages delivered but not kept: count=1 reporterID=" + std::to_string(reporterID);
+  }
+
+  const Value megabyte{std::string(1 << 20, 'x')};
+};
+
+TEST_F(FullBudgetTest, ASessionThatWasNeverStartedSaysWhatItDidNotKeepWhenItIsStopped) {
+  createOverBudget(77);
+  ask(*client, "stopReportingSessionForID", {77});
+  EXPECT_THAT(counted(), ElementsAre(unkept(77)));
+  ask(*client, "stopReportingSessionForID", {77});
+  EXPECT_THAT(counted(), IsEmpty());
+}
+
+TEST_F(FullBudgetTest, ASessionThatWasNeverStartedSaysWhatItDidNotKeepWhenItGoes) {
+  createOverBudget(77);
+  create(*client, 77);
+  EXPECT_THAT(counted(), ElementsAre(unkept(77)));
+  createOverBudget(78);
+  ask(*client, "destroyReportingSession", {78});
+  EXPECT_THAT(counted(), ElementsAre(unkept(78)));
+  createOverBudget(79);
+  ask(*client, "setServiceType", {2, 79});
+  EXPECT_THAT(counted(), ElementsAre(unkept(79)));
+  createOverBudget(80);
+  client->disconnect();
+  run();
+  EXPECT_THAT(counted(), ElementsAre(unkept(80)));
+}
+
 // Start and stop.
 
 TEST_F(RequestTest, TheStartsAnswerComesWithTheStopBeforeTheStopsOwn) {

@@ -743,6 +743,10 @@ class BudgetTest : public ReportingTest {
     return TWReportingSession::initWithID(77, {1}, budget);
   }
 
+  static std::string unkept(std::size_t count) {
+    return "messages delivered but not kept: count=" + std::to_string(count) + " reporterID=77";
+  }
+
   std::shared_ptr<KeptBytesBudget> budget;
 };
 
@@ -760,10 +764,48 @@ TEST_F(BudgetTest, PastItMessagesAreDeliveredButNotKeptWhichIsSaidOnceAndCounted
   EXPECT_EQ(session->totalMessageCount(), 10U);
 
   const std::size_t kept = session->messages().size() - 1;  // without the start message
+  EXPECT_GE(kept, 1U);
   session->stop();
   EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kError),
-              ElementsAre(HasSubstr("delivered but not kept. reporterID=77"), HasSubstr("count=")));
-  EXPECT_GE(kept, 1U);
+              ElementsAre(HasSubstr("delivered but not kept. reporterID=77"), unkept(10 - kept)));
+}
+
+// Neither its place among the messages nor its previous values count for themselves.
+TEST_F(BudgetTest, AMessageThatIsNotKeptCountsOnce) {
+  const auto session = makeSessionWithin(2'000);
+  session->start();
+  for (int n = 0; n < 11; ++n) session->sendMessage(message({{"a", n}, {"text", std::string(3'000, 'x')}}));
+  session->stop();
+  EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kError), Contains(unkept(11)));
+}
+
+TEST_F(BudgetTest, ARedundantMessageIsNotKeptByTheRuleAndCountsNowhere) {
+  const auto session = makeSessionWithin(6'000);
+  session->start();
+  const ValueMap payload{{"text", std::string(1'800, 'x')}};
+  for (int n = 0; n < 5; ++n) session->sendMessage(message(payload));
+  EXPECT_EQ(session->redundantMessageCount(), 4U);
+  session->stop();
+  EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kError), Not(Contains(HasSubstr("count="))));
+}
+
+TEST_F(BudgetTest, ASessionThatWasNeverStartedSaysAtItsStopWhatWasNotKept) {
+  const auto session = makeSessionWithin(2'000);
+  session->sendMessage(message({{"text", std::string(3'000, 'x')}}));
+  session->stop();
+  EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kError), Contains(unkept(1)));
+}
+
+TEST_F(BudgetTest, ASessionSaysAtItsEndWhatWasNotKeptSinceItLastSaidSo) {
+  auto session = makeSessionWithin(2'000);
+  session->start();
+  session->sendMessage(message({{"a", 1}, {"text", std::string(3'000, 'x')}}));
+  session->sendMessage(message({{"a", 2}, {"text", std::string(3'000, 'x')}}));
+  session->stop();
+  session->sendMessage(message({{"a", 3}, {"text", std::string(3'000, 'x')}}));
+  test.log.clear();
+  session.reset();
+  EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kError), ElementsAre(unkept(1)));
 }
 
 TEST_F(BudgetTest, AStopGivesBackWhatTheMessagesTookAndAReleaseEverything) {
