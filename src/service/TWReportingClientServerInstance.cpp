@@ -117,7 +117,7 @@ void TWReportingClientServerInstance::setConfiguration(ValueMap configuration, R
   onWorkQueue(std::move(request), [configuration = std::move(configuration), reporterID](auto& self, auto&,
                                                                                          const Reply& reply) {
     debugLog(category(), "setting configuration");
-    const Session session = self.findReportingSessionForID(reporterID, false);
+    const Session session = self.ownSession(reporterID);
     if (session != nullptr && !session->updateConfigurationWithContentsOfConfiguration(&configuration)) {
       return reply(overBudget(*self.budget_));
     }
@@ -249,8 +249,7 @@ void TWReportingClientServerInstance::killService() {
 
 TWReportingClientServerInstance::Session TWReportingClientServerInstance::findReportingSessionForID(
     ReporterID reporterID, bool acrossAllClients) {
-  const auto own = clientReportingSessionMap_.find(reporterID);
-  if (own != clientReportingSessionMap_.end()) return own->second;
+  if (Session own = ownSession(reporterID)) return own;
   const Delegate delegate = acrossAllClients ? delegate_.lock() : nullptr;
   return delegate == nullptr ? nullptr : delegate->findReportingSessionForID(reporterID);
 }

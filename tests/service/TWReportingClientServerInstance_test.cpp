@@ -83,7 +83,14 @@ TEST_F(RequestTest, IdentifierZeroIsStoredAndReachedOnlyByTeardown) {
        {"startReportingSessionForID", "stopReportingSessionForID", "destroyReportingSession"}) {
     EXPECT_EQ(askOnce(*client, method, {0}), Value(true));
   }
+  EXPECT_EQ(askOnce(*client, "setServiceType", {2, 0}), Value(true));
+  EXPECT_EQ(askOnce(*client, "setConfiguration", {ValueMap{{"a", 1}}, 0}), Value(true));
+  send({{"a", 1}}, Value(ValueArray{0}));
   EXPECT_FALSE(session.lock()->started());
+  EXPECT_EQ(session.lock()->serviceType(), 65535);
+  EXPECT_TRUE(session.lock()->configuration().empty());
+  EXPECT_THAT(session.lock()->messages(), IsEmpty());
+  EXPECT_EQ(validityOf(0), Value(ValueMap{{"reporterID", 0}, {"serviceType", 65535}}));
   client->disconnect();
   run();
   EXPECT_TRUE(session.expired());
