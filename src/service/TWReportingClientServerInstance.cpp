@@ -73,7 +73,7 @@ void TWReportingClientServerInstance::setServiceType(AudioServiceType serviceTyp
   onWorkQueue(std::move(request), [serviceType, reportingSession](auto& self, auto&, const Reply& reply) {
     debugLog(category(), "setting service type %i for reporter %lli", serviceType, reportingSession);
     if (const Session session = self.ownSession(reportingSession)) {
-      if (!self.changeServiceType(serviceType, session)) return reply(overBudget(*self.budget_));
+      self.changeServiceType(serviceType, session);
       debugLog(category(), "service type %i set for reporter  %lli", serviceType, reportingSession);
     }
     reply(std::nullopt, true);
@@ -82,21 +82,18 @@ void TWReportingClientServerInstance::setServiceType(AudioServiceType serviceTyp
 
 // A session reports for one service: another type makes another session, not started, with what the first was
 // told.
-bool TWReportingClientServerInstance::changeServiceType(AudioServiceType serviceType,
+void TWReportingClientServerInstance::changeServiceType(AudioServiceType serviceType,
                                                         const Session& session) {
-  if (session->serviceType() == serviceType) {
-    session->setServiceType(serviceType);
-    return true;
-  }
+  if (session->serviceType() == serviceType) return session->setServiceType(serviceType);
   const ValueMap configuration = session->configuration();
   const ValueMap previousValues = session->previousValues();
-  if (!budget_->hasRoomFor(configuration.bytes() + previousValues.bytes())) return false;
+  // First, so that there is room for what moves on, however full the budget is.
+  session->leaveBudget();
   const Session replacement = makeSession(session->reporterID());
   replacement->updateConfigurationWithContentsOfConfiguration(&configuration);
   replacement->addPreviousValues(previousValues);
   replacement->setServiceType(serviceType);
   clientReportingSessionMap_[session->reporterID()] = replacement;
-  return true;
 }
 
 void TWReportingClientServerInstance::getServiceNameForReporterID(ReporterID reporterID,

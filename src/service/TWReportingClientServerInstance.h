@@ -81,7 +81,7 @@ class TWReportingClientServerInstance final
 
   Session ownSession(ReporterID reporterID) const;
   Session makeSession(ReporterID reporterID) const;
-  bool changeServiceType(AudioServiceType serviceType, const Session& session);
+  void changeServiceType(AudioServiceType serviceType, const Session& session);
 
   const std::int32_t processIdentifier_;
   const std::weak_ptr<TWReportingServiceDelegateProtocol> delegate_;

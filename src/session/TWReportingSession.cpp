@@ -54,7 +54,18 @@ TWReportingSession::~TWReportingSession() {
   logUnkeptMessages();
   emitTracePoint(TWReportingTracePoint::kSessionReleased);
   infoLog(TWReportingSessionCategory(), "deallocing this session %lli", reporterID_);
-  budget_->give(messageBytes_ + configuration_.bytes() + previousValues_.bytes());
+  budget_->give(keptBytes());
+}
+
+std::size_t TWReportingSession::keptBytes() const {
+  return messageBytes_ + configuration_.bytes() + previousValues_.bytes();
+}
+
+void TWReportingSession::leaveBudget() {
+  const std::size_t kept = keptBytes();
+  budget_->give(kept);
+  budget_ = std::make_shared<KeptBytesBudget>(kept);
+  budget_->take(kept);
 }
 
 void TWReportingSession::setServiceType(AudioServiceType serviceType) {

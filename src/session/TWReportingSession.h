@@ -97,6 +97,9 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   // The latest value of every key received.
   ValueMap previousValues() const;
   void addPreviousValues(const ValueMap& values);
+  // The client has given the session up: what it keeps no longer counts against the client, however long
+  // others hold it.
+  void leaveBudget();
   // Not redundant ones, in order of arrival; sorted by time while the session stops.
   const TWReportingSessionMessages& messages() const { return messages_; }
   // Received since the session was made or last stopped, and how many of them were redundant.
@@ -129,6 +132,8 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   void startWorker(TWReportingSessionWorkerProtocol& worker);
   Workers workersInOrder(Order order) const;
   void deliver(const TWReportingSessionMessage& message);
+  // Taken from the budget.
+  std::size_t keptBytes() const;
   // False when there is no room left to keep it.
   bool store(const std::shared_ptr<TWReportingSessionMessage>& message);
   void rememberAsNewest(const TWReportingSessionMessage& message);
@@ -139,7 +144,7 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
 
   const ReporterID reporterID_;
   const ProcessIdentifiers processIdentifiers_;
-  const std::shared_ptr<KeptBytesBudget> budget_;
+  std::shared_ptr<KeptBytesBudget> budget_;
   AudioServiceType serviceType_ = kServiceUnknown;
   std::string serviceName_;
   bool started_ = false;

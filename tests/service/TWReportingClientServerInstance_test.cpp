@@ -196,10 +196,6 @@ TEST_F(RequestTest, AConfigurationPastTheBudgetIsRefusedAndChangesNothing) {
   ASSERT_TRUE(answers[0].error);
   EXPECT_EQ(answers[0].error->code, 3);
   EXPECT_EQ(sessionOf(0, 77)->configuration().size(), 255U);
-
-  const auto changed = ask(*client, "setServiceType", {2, 77});  // would hold it twice for a moment
-  EXPECT_EQ(changed.at(0).error->code, 3);
-  EXPECT_EQ(sessionOf(0, 77)->serviceType(), 65535);
 }
 
 // What is not kept.
@@ -257,6 +253,29 @@ TEST_F(FullBudgetTest, ASessionThatWasNeverStartedSaysWhatItDidNotKeepWhenItGoes
   client->disconnect();
   run();
   EXPECT_THAT(counted(), ElementsAre(unkept(80)));
+}
+
+// Of two sessions with one configuration there is never more than one.
+TEST_F(FullBudgetTest, AChangeOfTheServiceTypeAlwaysSucceedsAndKeepsWhatTheFirstWasTold) {
+  const ValueMap configuration = sessionOf(0, 70)->configuration();
+  send({{"volume", 1}}, Value(ValueArray{70}));
+  const ValueMap previousValues = sessionOf(0, 70)->previousValues();
+  for (const int serviceType : {2, 3, 2}) {
+    EXPECT_EQ(askOnce(*client, "setServiceType", {serviceType, 70}), Value(true));
+    EXPECT_EQ(sessionOf(0, 70)->serviceType(), serviceType);
+    EXPECT_EQ(sessionOf(0, 70)->configuration(), configuration);
+    EXPECT_EQ(sessionOf(0, 70)->previousValues(), previousValues);
+  }
+  EXPECT_EQ(ask(*client, "setConfiguration", {ValueMap{{"more", megabyte}}, 70}).at(0).error->code, 3);
+  EXPECT_THAT(counted(), IsEmpty());
+}
+
+TEST_F(FullBudgetTest, AReplacedSessionThatIsStillHeldCountsNoMore) {
+  const auto first = sessionOf(0, 70);
+  for (const int serviceType : {2, 3, 2}) ask(*client, "setServiceType", {serviceType, 70});
+  ask(*client, "destroyReportingSession", {70});
+  create(*client, 70);
+  EXPECT_EQ(askOnce(*client, "setConfiguration", {first->configuration(), 70}), Value(true));
 }
 
 // Start and stop.
