@@ -106,8 +106,9 @@ void SummaryJsonFile::closeFile() {
              "SummaryJsonFileWorker failed to closed file. action=close file=%@ error=\"%@\"", reportPath_,
              error.message());
   } else {
+    const Value path(reportPath_);
     infoLog(TWReportingSummaryLogCategory(), "SummaryJsonFileWorker closed file. action=close file=%@",
-            reportPath_);
+            reportPath_.empty() ? nullptr : &path);
   }
   reportFileHandle_.reset();
   reportPath_.clear();

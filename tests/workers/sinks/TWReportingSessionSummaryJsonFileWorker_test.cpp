@@ -217,7 +217,7 @@ TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, WithOnlyRedundantMessagesNoF
   EXPECT_THAT(test.files.files(), IsEmpty());
   EXPECT_EQ(test.files.directoryMode(kDirectory), std::nullopt);
   EXPECT_THAT(test.log.textsOf("twru", LogLevel::kInfo),
-              ElementsAre("SummaryJsonFileWorker closed file. action=close file="));
+              ElementsAre("SummaryJsonFileWorker closed file. action=close file=(null)"));
 }
 
 TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, LogsOpeningAndClosing) {
