@@ -32,12 +32,13 @@ void sendClientUptime(std::int32_t processIdentifier, std::optional<double> star
                shownName);
     }
   } else {
-    errorLog(log, "clientStartDate is nil. clientpid=%d clientprocessname=%@", processIdentifier, shownName);
+    // Whoever only looks whether somebody listens is gone before the work queue gets to it.
+    infoLog(log, "clientStartDate is nil. clientpid=%d clientprocessname=%@", processIdentifier, shownName);
   }
   infoLog(log, "invalidationHandler: connection exited process=%@ uptime_sec=%d", processName,
           seconds.integer());
   if (!processName) {
-    errorLog(log, "clientProcessName is nil. clientpid=%d", processIdentifier);
+    infoLog(log, "clientProcessName is nil. clientpid=%d", processIdentifier);
     return;
   }
   platform.metricon.sendEvent(kClientUptimeEvent, [&] {

@@ -47,8 +47,16 @@ TEST_F(ClientUptimeTest, FromAStartDateInTheFutureItIsTheIntervalAndLogged) {
 TEST_F(ClientUptimeTest, WithoutAProcessNameNothingIsSent) {
   sendClientUptime(11, test.clock.now(), std::nullopt);
   EXPECT_THAT(events(), IsEmpty());
-  EXPECT_THAT(test.log.textsOf("twrs", LogLevel::kError),
-              ElementsAre("clientProcessName is nil. clientpid=11"));
+  EXPECT_THAT(test.log.textsOf("twrs"),
+              ElementsAre("invalidationHandler: connection exited process=(null) uptime_sec=0",
+                          "clientProcessName is nil. clientpid=11"));
+}
+
+// A probe that connects and goes at once is no failure.
+TEST_F(ClientUptimeTest, AClientThatWasGoneBeforeItWasKnownIsNoError) {
+  sendClientUptime(11, std::nullopt, std::nullopt);
+  EXPECT_THAT(test.log.textsOf("twrs", LogLevel::kInfo), SizeIs(3));
+  EXPECT_THAT(test.log.textsAt(LogLevel::kError), IsEmpty());
 }
 
 }  // namespace

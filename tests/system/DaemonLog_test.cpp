@@ -5,13 +5,17 @@
 #include <set>
 #include <sstream>
 #include <string>
+#include <vector>
 
 #include "system/support/DaemonTest.h"
 
 namespace tonewerk {
 namespace {
 
+using ::testing::AllOf;
 using ::testing::Contains;
+using ::testing::ElementsAre;
+using ::testing::HasSubstr;
 using ::testing::IsSubsetOf;
 using ::testing::IsSupersetOf;
 using ::testing::Not;
@@ -39,6 +43,13 @@ class DaemonLogTest : public DaemonTest {
       std::smatch parts;
       if (std::regex_match(line, parts, kLine)) found.insert(parts[1]);
     }
+    return found;
+  }
+
+  static std::vector<std::string> linesIn(const std::string& text) {
+    std::vector<std::string> found;
+    std::istringstream lines(text);
+    for (std::string line; std::getline(lines, line);) found.push_back(line);
     return found;
   }
 
@@ -79,6 +90,37 @@ TEST_F(DaemonLogTest, OneCategoryCanBeWatchedAlone) {
   EXPECT_GT(logLinesWith("Z debug twrr "), 0U);
   EXPECT_EQ(logLinesWith("Z debug twrs "), 0U);
   EXPECT_EQ(logLinesWith("Z info twrs "), 0U);
+}
+
+// Where the reports go, and that they went.
+TEST_F(DaemonLogTest, ASessionsLifeTakesTwoLinesAndNoneIsAnError) {
+  daemon.setEnvironment("TONEWERK_LOG", "");
+  ASSERT_TRUE(daemon.start());
+  const std::size_t before = daemon.log().size();
+  {
+    DaemonClient client = connect();
+    client.create(77, 7);
+    client.setConfiguration(77, {{"HostApplicationDisplayID", "com.example.player"}});
+    client.start(77);
+    for (int n = 0; n < 3; ++n) {
+      client.send({{"a", n}}, 4, kTypeStart, {77});
+      client.send({{"b", n}}, 4, kTypeStop, {});
+    }
+    client.stop(77);
+    client.destroy(77);
+  }
+  EXPECT_EQ(daemon.stop(), 0);
+  EXPECT_THAT(
+      linesIn(daemon.log().substr(before)),
+      ElementsAre(AllOf(HasSubstr(" default twri "), HasSubstr("list of backends")),
+                  AllOf(HasSubstr(" default twri "), HasSubstr("sending rtc summary event. reporterID=77"))));
+}
+
+TEST_F(DaemonLogTest, AProbeThatComesAndGoesIsNoError) {
+  ASSERT_TRUE(daemon.start());
+  for (int n = 0; n < 50; ++n) EXPECT_TRUE(daemon.accepts());
+  EXPECT_EQ(daemon.stop(), 0);
+  EXPECT_THAT(levels(), Not(Contains("error"))) << daemon.log();
 }
 
 TEST_F(DaemonLogTest, AThresholdThatIsNoneIsSaidAndNotUsed) {

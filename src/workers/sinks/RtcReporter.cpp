@@ -117,11 +117,8 @@ void RtcReporter::takeTimeout(std::uint64_t run) {
 }
 
 void RtcReporter::endWait() {
-  if (linkReportSessionStarted_) {
-    debugLog(TWReportingSessionLinkReportCategory(), "continuing with backends!");
-  } else {
-    errorLog(TWReportingSessionLinkReportCategory(), "failed to find backend");
-  }
+  debugLog(TWReportingSessionLinkReportCategory(), "%s",
+           linkReportSessionStarted_ ? "continuing with backends!" : "failed to find backend");
   goOn();
 }
 
