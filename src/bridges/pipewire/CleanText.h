@@ -11,8 +11,8 @@ namespace tonewerk {
 // is UTF-8 and short.
 inline constexpr std::size_t kMaxTextBytes = 256;
 
-// `text` with a '?' for each byte that is no UTF-8 and for each control character, cut before the character
-// that would exceed kMaxTextBytes.
+// `text` with U+FFFD for what is no UTF-8 and a '?' for each control character, cut before the character that
+// would exceed kMaxTextBytes.
 std::string cleanText(std::string_view text);
 
 }  // namespace tonewerk

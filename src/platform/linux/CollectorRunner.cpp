@@ -9,6 +9,8 @@
 #include <utility>
 
 #include "platform/linux/ThreadProperties.h"
+#include "platform/linux/Utf8.h"
+#include "values/ShortenedText.h"
 
 namespace tonewerk {
 
@@ -38,8 +40,11 @@ DiagnosticEvidence CollectorRunner::run() {
   for (const std::shared_ptr<Slot>& slot : slots_) {
     const std::string name(slot->collector->fileName());
     DiagnosticCollector::Result result = runOne(slot);
+    // Whatever processes, cards and nodes call themselves: who reads evidence may count on text.
+    result.text = validUtf8(std::move(result.text));
+    result.problem = validUtf8(std::move(result.problem));
     if (result.text.size() > limits_.bytes) {
-      result.text.resize(limits_.bytes);
+      result.text.resize(shortened(result.text, limits_.bytes).size());
       result.problem = "cut at " + std::to_string(limits_.bytes) + " bytes";
     }
     if (!result.problem.empty()) evidence.problems.emplace_back(name, std::move(result.problem));

@@ -10,6 +10,7 @@
 #include "platform/Clock.h"
 #include "platform/linux/FileDescriptor.h"
 #include "platform/linux/TextFile.h"
+#include "platform/linux/Utf8.h"
 #include "values/CompactJson.h"
 #include "values/Value.h"
 
@@ -80,7 +81,7 @@ class JsonBenchfileWriter final : public BenchfileWriter {
 
 std::string hostName() {
   char name[256] = {};
-  return gethostname(name, sizeof(name) - 1) == 0 ? name : "";
+  return gethostname(name, sizeof(name) - 1) == 0 ? validUtf8(name) : "";
 }
 
 }  // namespace

@@ -227,7 +227,7 @@ bool LinuxFileSystem::exists(const std::string& path) const {
 
 std::error_code LinuxFileSystem::readFile(const std::string& path, std::string& text) const {
   if (path.find('\0') != std::string::npos) return std::make_error_code(std::errc::invalid_argument);
-  return readTextFile(path, text);
+  return readFileBytes(path, text);
 }
 
 std::error_code LinuxFileSystem::moveFile(const std::string& from, const std::string& directory,

@@ -12,7 +12,7 @@ class LinuxProcessInformation final : public ProcessInformation {
   explicit LinuxProcessInformation(std::string procDirectory = "/proc")
       : procDirectory_(std::move(procDirectory)) {}
 
-  // PID/comm.
+  // PID/comm, which the kernel cuts to 15 bytes. What it leaves of a character reads as U+FFFD.
   std::optional<std::string> processName(std::int32_t processIdentifier) const override;
   std::int32_t ownProcessIdentifier() const override;
   // RssAnon and VmSwap of self/status: counters that the kernel keeps anyway, unlike the precise walk over

@@ -3,11 +3,13 @@
 
 #include <utility>
 
+#include "values/ShortenedText.h"
+
 namespace tonewerk {
 
 void RecentLines::add(std::string_view line) {
   if (!line.empty() && line.back() == '\n') line.remove_suffix(1);
-  std::string kept(line.substr(0, limits_.lineBytes - 1));
+  std::string kept(shortened(line, limits_.lineBytes - 1));
   kept += '\n';
   const std::lock_guard lock(mutex_);
   bytes_ += kept.size();

@@ -1,11 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/RememberingLog.h"
 
+#include <string>
 #include <utility>
 
 #include "platform/Clock.h"
 #include "platform/linux/RecentLines.h"
 #include "platform/linux/StreamLog.h"
+#include "platform/linux/Utf8.h"
 
 namespace tonewerk {
 
@@ -17,8 +19,10 @@ RememberingLog::~RememberingLog() = default;
 
 void RememberingLog::write(std::string_view subsystem, std::string_view category, LogLevel level,
                            std::string_view message) {
-  log_->write(subsystem, category, level, message);
-  lines_->add(StreamLog::format(clock_.now(), category, level, message));
+  // Lines quote what tools, files and directories say.
+  const std::string text = validUtf8(std::string(message));
+  log_->write(subsystem, category, level, text);
+  lines_->add(StreamLog::format(clock_.now(), category, level, text));
 }
 
 }  // namespace tonewerk

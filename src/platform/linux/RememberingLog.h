@@ -11,7 +11,7 @@ class Clock;
 class RecentLines;
 
 // A log that keeps the last lines written to it besides, in the form of StreamLog, for those who ask what
-// went before.
+// went before. A line that is not all UTF-8 is made so first: the journal shows such a one as a blob.
 class RememberingLog final : public Log {
  public:
   // `clock` outlives the log.

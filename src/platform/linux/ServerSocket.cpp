@@ -4,7 +4,6 @@
 #include <cerrno>
 #include <fcntl.h>
 #include <filesystem>
-#include <fstream>
 #include <optional>
 #include <sys/file.h>
 #include <sys/stat.h>
@@ -12,6 +11,7 @@
 #include <systemd/sd-daemon.h>
 #include <utility>
 
+#include "platform/linux/LinuxProcessInformation.h"
 #include "platform/linux/UnixAddress.h"
 
 namespace tonewerk {
@@ -50,9 +50,7 @@ std::string peerOf(int descriptor) {
   ucred peer{};
   socklen_t size = sizeof(peer);
   if (::getsockopt(descriptor, SOL_SOCKET, SO_PEERCRED, &peer, &size) != 0) return "another process";
-  std::ifstream comm("/proc/" + std::to_string(peer.pid) + "/comm");
-  std::string name;
-  if (!std::getline(comm, name)) name = "another process";
+  const std::string name = LinuxProcessInformation().processName(peer.pid).value_or("another process");
   return name + " (" + std::to_string(peer.pid) + ")";
 }
 

@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "platform/linux/TextFile.h"
+#include "values/ShortenedText.h"
 
 namespace tonewerk {
 namespace {
@@ -45,7 +46,7 @@ DiagnosticCollector::Result SoundStatusCollector::collect() {
     std::string text;
     const std::error_code failed = readTextFile(path, text);
     if (failed) text = "(" + failed.message() + ")";
-    if (text.size() > limits_.fileBytes) text = text.substr(0, limits_.fileBytes) + "\n(cut)";
+    if (text.size() > limits_.fileBytes) text = std::string(shortened(text, limits_.fileBytes)) + "\n(cut)";
     if (text.empty() || text.back() != '\n') text += '\n';
     if (result.text.size() + path.size() + text.size() > limits_.bytes) {
       result.problem = "more than " + std::to_string(limits_.bytes) + " bytes";

@@ -4,6 +4,8 @@
 #include <sqlite3.h>
 #include <utility>
 
+#include "platform/linux/Utf8.h"
+
 namespace tonewerk {
 
 SqliteStatement::SqliteStatement(SqliteStatement&& other) noexcept
@@ -64,8 +66,8 @@ double SqliteStatement::number(int column) const { return sqlite3_column_double(
 std::string SqliteStatement::text(int column) const {
   const unsigned char* text = sqlite3_column_text(statement_, column);
   if (text == nullptr) return {};
-  return {reinterpret_cast<const char*>(text),
-          static_cast<std::size_t>(sqlite3_column_bytes(statement_, column))};
+  return validUtf8({reinterpret_cast<const char*>(text),
+                    static_cast<std::size_t>(sqlite3_column_bytes(statement_, column))});
 }
 
 std::string SqliteStatement::bytes(int column) const {

@@ -42,6 +42,7 @@ class SqliteStatement {
   // Columns of the current row, from 0.
   std::int64_t integer(int column) const;
   double number(int column) const;
+  // UTF-8, whoever wrote to the file.
   std::string text(int column) const;
   std::string bytes(int column) const;
   bool isNull(int column) const;

@@ -5,8 +5,10 @@
 #include <cerrno>
 #include <fcntl.h>
 #include <unistd.h>
+#include <utility>
 
 #include "platform/linux/FileDescriptor.h"
+#include "platform/linux/Utf8.h"
 
 namespace tonewerk {
 namespace {
@@ -17,8 +19,14 @@ constexpr std::size_t kMostBytes = std::size_t{16} << 20;
 
 std::error_code lastSystemError() { return {errno, std::generic_category()}; }
 
-std::error_code readTextFile(const std::string& path, std::string& text, struct stat* status) {
-  text.clear();
+std::error_code readTextFile(const std::string& path, std::string& text) {
+  const std::error_code error = readFileBytes(path, text);
+  text = validUtf8(std::move(text));
+  return error;
+}
+
+std::error_code readFileBytes(const std::string& path, std::string& bytes, struct stat* status) {
+  bytes.clear();
   // Non-blocking, so that a pipe in the file's place cannot hold the caller.
   const FileDescriptor file(open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK));
   if (!file) return lastSystemError();
@@ -34,8 +42,8 @@ std::error_code readTextFile(const std::string& path, std::string& text, struct 
     if (count < 0 && errno == EINTR) continue;
     if (count < 0) return lastSystemError();
     if (count == 0) return {};
-    text.append(buffer.data(), static_cast<std::size_t>(count));
-    if (text.size() > kMostBytes) return std::make_error_code(std::errc::file_too_large);
+    bytes.append(buffer.data(), static_cast<std::size_t>(count));
+    if (bytes.size() > kMostBytes) return std::make_error_code(std::errc::file_too_large);
   }
 }
 

@@ -19,7 +19,7 @@ void TomlFile::read() {
   stamp_.reset();
   std::string text;
   struct stat status {};
-  const std::error_code error = readTextFile(path_, text, &status);
+  const std::error_code error = readFileBytes(path_, text, &status);
   if (error == std::errc::no_such_file_or_directory) {
     values_ = {};
     problem_.clear();

@@ -8,48 +8,82 @@
 namespace tonewerk {
 namespace {
 
-bool isContinuation(std::uint8_t byte) { return (byte & 0xC0U) == 0x80U; }
+constexpr std::string_view kReplacement = "\xEF\xBF\xBD";  // U+FFFD
 
-// The length of the well-formed sequence of two or more bytes at the start of `text`, 0 for none.
-std::size_t sequenceLength(std::string_view text) {
-  const auto byte = [&](std::size_t at) { return static_cast<std::uint8_t>(text[at]); };
-  const std::uint8_t first = byte(0);
-  if (text.size() < 2 || !isContinuation(byte(1))) return 0;
-  const std::uint8_t second = byte(1);
+std::uint8_t byteAt(std::string_view text, std::size_t at) { return static_cast<std::uint8_t>(text[at]); }
 
+// How many bytes a character has that begins with `first`; 0 when none does.
+std::size_t announcedLength(std::uint8_t first) {
+  if (first < 0x80) return 1;
   if (first >= 0xC2 && first <= 0xDF) return 2;
-  if (text.size() < 3 || !isContinuation(byte(2))) return 0;
-  if (first == 0xE0) return second >= 0xA0 ? 3 : 0;  // below are overlong forms
-  if (first == 0xED) return second <= 0x9F ? 3 : 0;  // above are surrogates
-  if (first >= 0xE1 && first <= 0xEF) return 3;
-  if (text.size() < 4 || !isContinuation(byte(3))) return 0;
-  if (first == 0xF0) return second >= 0x90 ? 4 : 0;  // below are overlong forms
-  if (first == 0xF4) return second <= 0x8F ? 4 : 0;  // above is beyond U+10FFFF
-  return first >= 0xF1 && first <= 0xF3 ? 4 : 0;
+  if (first >= 0xE0 && first <= 0xEF) return 3;
+  if (first >= 0xF0 && first <= 0xF4) return 4;
+  return 0;
+}
+
+// Overlong forms, surrogates and what lies beyond U+10FFFF show in the second byte.
+bool mayFollow(std::uint8_t first, std::uint8_t second) {
+  const std::uint8_t least = first == 0xE0 ? 0xA0 : first == 0xF0 ? 0x90 : 0x80;
+  const std::uint8_t most = first == 0xED ? 0x9F : first == 0xF4 ? 0x8F : 0xBF;
+  return second >= least && second <= most;
+}
+
+// How many bytes at the start of `text` could be, or are, a character's; at least 1.
+std::size_t matchingBytes(std::string_view text, std::size_t announced) {
+  std::size_t count = 1;
+  while (count < announced && count < text.size()) {
+    const std::uint8_t byte = byteAt(text, count);
+    const bool matches = count == 1 ? mayFollow(byteAt(text, 0), byte) : (byte & 0xC0U) == 0x80U;
+    if (!matches) break;
+    ++count;
+  }
+  return count;
+}
+
+// How much of the start of `text` is well-formed.
+std::size_t validBytes(std::string_view text) {
+  std::size_t at = 0;
+  while (at < text.size()) {
+    // Nearly all text is ASCII: eight bytes at a time while none has its high bit set.
+    std::uint64_t word = 0;
+    if (text.size() - at >= sizeof(word)) {
+      std::memcpy(&word, text.data() + at, sizeof(word));
+      if ((word & 0x8080808080808080U) == 0) {
+        at += sizeof(word);
+        continue;
+      }
+    }
+    const std::size_t length = utf8CharacterLength(text.substr(at));
+    if (length == 0) break;
+    at += length;
+  }
+  return at;
 }
 
 }  // namespace
 
-bool isUtf8(std::string_view text) {
-  while (!text.empty()) {
-    // Nearly all text is ASCII: eight bytes at a time while none has its high bit set.
-    std::uint64_t word = 0;
-    if (text.size() >= sizeof(word)) {
-      std::memcpy(&word, text.data(), sizeof(word));
-      if ((word & 0x8080808080808080U) == 0) {
-        text.remove_prefix(sizeof(word));
-        continue;
-      }
-    }
-    if (static_cast<std::uint8_t>(text.front()) < 0x80) {
-      text.remove_prefix(1);
-      continue;
-    }
-    const std::size_t length = sequenceLength(text);
-    if (length == 0) return false;
-    text.remove_prefix(length);
+std::size_t utf8CharacterLength(std::string_view text) {
+  const std::size_t announced = announcedLength(byteAt(text, 0));
+  return announced > 0 && matchingBytes(text, announced) == announced ? announced : 0;
+}
+
+bool isUtf8(std::string_view text) { return validBytes(text) == text.size(); }
+
+std::string validUtf8(std::string text) {
+  std::string_view rest = text;
+  std::size_t valid = validBytes(rest);
+  if (valid == rest.size()) return text;
+  std::string repaired;
+  repaired.reserve(text.size() + kReplacement.size());
+  while (valid < rest.size()) {
+    repaired += rest.substr(0, valid);
+    repaired += kReplacement;
+    rest.remove_prefix(valid);
+    rest.remove_prefix(matchingBytes(rest, announcedLength(byteAt(rest, 0))));
+    valid = validBytes(rest);
   }
-  return true;
+  repaired += rest;
+  return repaired;
 }
 
 }  // namespace tonewerk

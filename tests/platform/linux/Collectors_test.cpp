@@ -64,6 +64,11 @@ TEST_F(CollectorsTest, ReadsTheProcessTable) {
   EXPECT_EQ(rows[1].lockedBytes, 8u * 1024);
 }
 
+TEST_F(CollectorsTest, AProcessNameThatIsCutInACharacterIsStillText) {
+  putProcess(20, "lecteur-musiqu\xC3", 0, "");
+  EXPECT_EQ(readProcessTable(directory.path()).at(0).name, "lecteur-musiqu\uFFFD");
+}
+
 TEST_F(CollectorsTest, ReadsTheKernelsProcessTable) {
   const std::vector<ProcessRow> rows = readProcessTable();
   const auto own = std::find_if(rows.begin(), rows.end(),
@@ -145,6 +150,12 @@ TEST_F(CollectorsTest, BoundsWhatItTakesOfSoundDevices) {
   const DiagnosticCollector::Result cut = collect({3, 100, directory.path().size() + 20, 2});
   EXPECT_THAT(cut.problem, StartsWith("more than "));
   EXPECT_EQ(cut.text, "== " + directory.path("a") + "\n12345\n");
+}
+
+TEST_F(CollectorsTest, CutsWhatASoundDeviceSaysBetweenCharacters) {
+  put("a", "123\u00E9");
+  EXPECT_THAT(SoundStatusCollector(directory.path(), {3, 4, 1000, 2}).collect().text,
+              HasSubstr("\n123\n(cut)\n"));
 }
 
 TEST_F(CollectorsTest, SaysWhenThereAreNoSoundDevices) {

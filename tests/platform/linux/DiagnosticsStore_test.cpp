@@ -194,6 +194,20 @@ TEST_F(DiagnosticsStoreTest, CutsWhatACollectorGivesBeyondItsBound) {
   EXPECT_THAT(*items.readFile(DiagnosticKind::kWhirlcap, name, "over.txt"), SizeIs(10));
 }
 
+TEST_F(DiagnosticsStoreTest, EvidenceIsTextAlsoWhereItIsCut) {
+  collectors = {
+      std::make_shared<FixedCollector>("a.txt", DiagnosticCollector::Result{"Caf\xE9", "no \xC3"}),
+      std::make_shared<FixedCollector>("b.txt", DiagnosticCollector::Result{"nine nine\u00E9", ""})};
+  DiagnosticsStore::Limits limits;
+  limits.collectors.bytes = 10;
+  start(limits);
+  const std::string name = addAndTake({DiagnosticKind::kWhirlcap}).name;
+  EXPECT_EQ(request(DiagnosticKind::kWhirlcap, name).text("problems"),
+            "{\"a.txt\":\"no \uFFFD\",\"b.txt\":\"cut at 10 bytes\"}");
+  EXPECT_EQ(items.readFile(DiagnosticKind::kWhirlcap, name, "a.txt"), "Caf\uFFFD");
+  EXPECT_EQ(items.readFile(DiagnosticKind::kWhirlcap, name, "b.txt"), "nine nine");
+}
+
 TEST_F(DiagnosticsStoreTest, NamesACollectorThatHangsAndDoesNotAskItAgainMeanwhile) {
   collectors = {held, std::make_shared<FixedCollector>("c.txt", DiagnosticCollector::Result{"whole", ""})};
   DiagnosticsStore::Limits limits;

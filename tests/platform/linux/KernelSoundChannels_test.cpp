@@ -68,6 +68,12 @@ TEST_F(KernelSoundChannelsTest, GivesPlaybackAsTx) {
   EXPECT_FALSE(error_);
 }
 
+TEST_F(KernelSoundChannelsTest, ACardsNameIsTextWhateverBytesItHas) {
+  tree_.write("proc/asound/card0/id", "Casque\xE9\n");
+  EXPECT_THAT(namesOf(readGroup("Speaker")),
+              ElementsAre("Casque\uFFFD Speaker Power", "Headset Speaker Power"));
+}
+
 TEST_F(KernelSoundChannelsTest, GivesCaptureAsRx) {
   EXPECT_THAT(namesOf(readGroup("Rx")), ElementsAre("PCH Rx pcm0 sub0 Hardware Position",
                                                     "PCH Rx pcm0 sub0 Delay", "PCH Rx pcm0 sub0 State"));

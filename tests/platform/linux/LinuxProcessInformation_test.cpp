@@ -46,6 +46,13 @@ TEST(LinuxProcessInformationTest, ANameKeepsItsSpaces) {
   EXPECT_EQ(proc.information().processName(7), "Web Content ");
 }
 
+// "lecteur-musiqué", cut where the kernel cuts names: after 15 bytes.
+TEST(LinuxProcessInformationTest, ANameThatEndsInHalfACharacterEndsInTheReplacementCharacter) {
+  MadeProc proc;
+  proc.write("7/comm", "lecteur-musiqu\xC3\n");
+  EXPECT_EQ(proc.information().processName(7), "lecteur-musiqu\uFFFD");
+}
+
 TEST(LinuxProcessInformationTest, TheFootprintIsResidentAndSwappedAnonymousMemory) {
   MadeProc proc;
   proc.write(

@@ -36,6 +36,23 @@ TEST(RecentLinesTest, CutsLongLines) {
   EXPECT_EQ(lines.text(), "abcd\nabcd\n");
 }
 
+TEST(RecentLinesTest, CutsLongLinesBetweenCharacters) {
+  RecentLines lines({100, 1000, 5});
+  lines.add("abc\u00E9");
+  EXPECT_EQ(lines.text(), "abc\n");
+}
+
+TEST(RememberingLogTest, ALineIsTextWhateverItQuotes) {
+  ManualClock clock;
+  auto inner = std::make_unique<MemoryLog>();
+  const MemoryLog& written = *inner;
+  const auto lines = std::make_shared<RecentLines>();
+  RememberingLog log(std::move(inner), lines, clock);
+  log.write("com.orvane.tonewerk", "twrr", LogLevel::kError, "a tool said \xE9");
+  EXPECT_EQ(written.lines().front().message, "a tool said \uFFFD");
+  EXPECT_TRUE(lines->text().ends_with("a tool said \uFFFD\n"));
+}
+
 TEST(RememberingLogTest, KeepsWhatItPassesOn) {
   ManualClock clock;
   auto inner = std::make_unique<MemoryLog>();

@@ -91,6 +91,15 @@ TEST_F(StoreReaderTest, ReadsWithoutAWriterAndItsSideFiles) {
   EXPECT_THAT(payloads(), ElementsAre(R"({"n":1})"));
 }
 
+// SQLite keeps as text whatever it is given; a store may be older than the rule that nothing else comes in.
+TEST_F(StoreReaderTest, GivesTextWhateverBytesTheFileHolds) {
+  openStore();
+  store_->recordEvent(clock_.now(), "x.a", {{"processName", "lecteur-musiqu\xC3"}});
+  ASSERT_TRUE(store_->flush(std::chrono::seconds(30)));
+  ASSERT_EQ(open(), StoreReader::Outcome::kDone);
+  EXPECT_THAT(payloads(), ElementsAre("{\"processName\":\"lecteur-musiqu\uFFFD\"}"));
+}
+
 TEST_F(StoreReaderTest, LetsThroughWhatTheFilterSays) {
   openStore();
   for (const char* name : {"x.a", "x.b", "y.a", "y.b"}) record(name);

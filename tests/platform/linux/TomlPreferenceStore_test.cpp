@@ -53,6 +53,16 @@ TEST_F(TomlPreferenceStoreTest, TheWrittenFileHoldsOnlyWhatDiffers) {
   EXPECT_EQ(contentsOf(configured()), "a = 1\nb = 2\n");
 }
 
+// Read with a replacement, it would be written back with one.
+TEST_F(TomlPreferenceStoreTest, AFileThatIsNotUtf8IsSaidNotToParseAndNotOverwritten) {
+  const std::string contents = "name = \"Caf\xE9\"\n";
+  write(written(), contents);
+  EXPECT_EQ(store_.read(kDomain, "name"), std::nullopt);
+  EXPECT_THAT(log_.textsAt(LogLevel::kError), testing::ElementsAre(HasSubstr(written() + ":1:")));
+  EXPECT_TRUE(store_.write(kDomain, "other", 1));
+  EXPECT_EQ(contentsOf(written()), contents);
+}
+
 TEST_F(TomlPreferenceStoreTest, ReadsWhatAnotherProcessWrote) {
   EXPECT_FALSE(store_.write(kDomain, "a", 1));
   EXPECT_EQ(store_.read(kDomain, "a"), Value(1));

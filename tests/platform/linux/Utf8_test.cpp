@@ -24,6 +24,55 @@ TEST_P(Utf8Test, TellsTextFromOtherBytes) {
   EXPECT_EQ(isUtf8(bytes + " and more than eight ascii bytes"), GetParam().isText);
 }
 
+// As Unicode recommends: one U+FFFD for the longest beginning of a character, else for a byte.
+struct Repaired {
+  const char* name;
+  const char* hex;
+  const char* text;
+};
+
+class RepairedTextTest : public testing::TestWithParam<Repaired> {};
+
+TEST_P(RepairedTextTest, HasTheReplacementForWhatIsNoText) {
+  const std::string bytes = fromHex(GetParam().hex);
+  const std::string text = GetParam().text;
+  EXPECT_EQ(validUtf8(bytes), text);
+  EXPECT_EQ(validUtf8("eight ascii bytes and \u00E9 " + bytes), "eight ascii bytes and \u00E9 " + text);
+  EXPECT_EQ(validUtf8(bytes + " and more than eight"), text + " and more than eight");
+  EXPECT_TRUE(isUtf8(validUtf8(bytes)));
+}
+
+INSTANTIATE_TEST_SUITE_P(All, RepairedTextTest,
+                         testing::Values(Repaired{"Nothing", "", ""}, Repaired{"Ascii", "41 7F", "A\x7F"},
+                                         Repaired{"TwoBytes", "C3 A9", "\u00E9"},
+                                         Repaired{"ThreeBytes", "E2 82 AC", "\u20AC"},
+                                         Repaired{"FourBytes", "F0 9F 8E B5", "\U0001F3B5"},
+                                         Repaired{"LoneContinuation", "80 41 BF",
+                                                  "\uFFFD"
+                                                  "A\uFFFD"},
+                                         Repaired{"TwoCutShort", "C3", "\uFFFD"},
+                                         Repaired{"ThreeCutShort", "41 E2 82", "A\uFFFD"},
+                                         Repaired{"FourCutShort", "F0 9F 8E", "\uFFFD"},
+                                         Repaired{"CutShortInTheMiddle", "F0 9F 41 C3 42",
+                                                  "\uFFFD"
+                                                  "A\uFFFD"
+                                                  "B"},
+                                         Repaired{"CutShortByAnother", "E2 82 C3 A9", "\uFFFD\u00E9"},
+                                         Repaired{"OverlongTwo", "C0 AF", "\uFFFD\uFFFD"},
+                                         Repaired{"OverlongThree", "E0 9F BF", "\uFFFD\uFFFD\uFFFD"},
+                                         Repaired{"OverlongFour", "F0 8F BF BF", "\uFFFD\uFFFD\uFFFD\uFFFD"},
+                                         Repaired{"Surrogate", "ED A0 80", "\uFFFD\uFFFD\uFFFD"},
+                                         Repaired{"PastTheLast", "F4 90 80 80", "\uFFFD\uFFFD\uFFFD\uFFFD"},
+                                         Repaired{"NoSuchByte", "FE FF", "\uFFFD\uFFFD"}),
+                         [](const auto& tested) { return tested.param.name; });
+
+TEST(Utf8CharacterLengthTest, IsThatOfTheFirstCharacterAlone) {
+  EXPECT_EQ(utf8CharacterLength("a\xFF"), 1U);
+  EXPECT_EQ(utf8CharacterLength("\u20AC\xFF"), 3U);
+  EXPECT_EQ(utf8CharacterLength("\xC3"), 0U);
+  EXPECT_EQ(utf8CharacterLength("\x80"), 0U);
+}
+
 INSTANTIATE_TEST_SUITE_P(
     All, Utf8Test,
     testing::Values(Case{"Nothing", "", true}, Case{"Zero", "00", true}, Case{"Ascii", "41 7F", true},

@@ -1,0 +1,102 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What a client's process calls itself, in everything that names it.
+#include <filesystem>
+#include <nlohmann/json.hpp>
+#include <string>
+#include <sys/prctl.h>
+#include <vector>
+
+#include "system/support/DaemonTest.h"
+#include "system/support/RecordedEvents.h"
+
+namespace tonewerk {
+namespace {
+
+using nlohmann::json;
+using ::testing::SizeIs;
+
+constexpr ReporterID kSession = 77;
+constexpr const char* kSummary = "com.orvane.unknown.Session_Generic.Summary";
+constexpr const char* kUptime = "com.orvane.tonewerk.twreportingclientuptime";
+
+// Fifteen bytes are what the kernel keeps: all but the second half of the last character.
+constexpr const char* kName = "lecteur-musiqu\u00E9";
+constexpr const char* kNameAsText = "lecteur-musiqu\uFFFD";
+
+// Gives this process, of which it is the first thread, another name for a while.
+class ProcessName {
+ public:
+  explicit ProcessName(const char* name) {
+    ::prctl(PR_GET_NAME, before_);
+    ::prctl(PR_SET_NAME, name);
+  }
+  ProcessName(const ProcessName&) = delete;
+  ProcessName& operator=(const ProcessName&) = delete;
+  ~ProcessName() { ::prctl(PR_SET_NAME, before_); }
+
+ private:
+  char before_[16] = {};
+};
+
+// On internal builds, where every session has its summary file.
+class ProcessNamesTest : public DaemonTest {
+ protected:
+  void SetUp() override {
+    ASSERT_TRUE(daemon.writeConfiguration("device-facts.toml", "InternalBuild = true\n"));
+    ASSERT_TRUE(daemon.start());
+  }
+
+  std::vector<json> waitForEvent(const std::string& name) const {
+    std::vector<json> events;
+    waitUntil([&] { return !(events = RecordedEvents(daemon.storePath()).named(name)).empty(); });
+    return events;
+  }
+
+  // The one summary file, once it is complete.
+  json summaryFile() const {
+    json file;
+    EXPECT_TRUE(waitUntil([&] {
+      std::error_code error;
+      const std::filesystem::directory_iterator entry(daemon.path(DaemonProcess::kLogs, "Audio/Reporting"),
+                                                      error);
+      if (error || entry == std::filesystem::directory_iterator()) return false;
+      file = json::parse(textOfFile(entry->path()), nullptr, false);
+      return !file.is_discarded();
+    }));
+    return file;
+  }
+};
+
+TEST_F(ProcessNamesTest, ANameThatIsCutInACharacterIsTextInEverythingThatComesOfTheSession) {
+  const ProcessName name(kName);
+  {
+    DaemonClient client = connect();
+    client.create(kSession);
+    client.start(kSession);
+    client.send({{"a", 1}}, 4, kTypeStart, {kSession});
+
+    const auto line =
+        outputOf({TONEWERK_TWCTL_PATH, {"top", "--json", "--interval", "0.1"}, daemon.clientEnvironment()});
+    ASSERT_TRUE(line);
+    const json shown = json::parse(*line, nullptr, false);
+    ASSERT_TRUE(shown.is_object()) << *line;
+    EXPECT_EQ(shown.at("processName"), kNameAsText);
+    client.stop(kSession);
+  }
+  const std::vector<json> summaries = waitForEvent(kSummary);
+  ASSERT_THAT(summaries, SizeIs(1));
+  ASSERT_TRUE(summaries[0].is_object());
+  EXPECT_EQ(summaries[0].at("clientProcessName"), kNameAsText);
+  // Of several: twctl is a client, too.
+  EXPECT_TRUE(waitUntil([&] {
+    for (const json& event : waitForEvent(kUptime)) {
+      if (event.is_object() && event.at("processName") == kNameAsText) return true;
+    }
+    return false;
+  }));
+  EXPECT_EQ(summaryFile().back().at("Session_Generic_Summary_1").at("clientProcessName"), kNameAsText);
+}
+
+}  // namespace
+}  // namespace tonewerk
