@@ -186,6 +186,11 @@ std::int64_t Value::integer() const {
   return 0;
 }
 
+std::int32_t Value::integer32() const {
+  const std::uint64_t* number = asUnsigned();
+  return static_cast<std::int32_t>(number == nullptr ? static_cast<std::uint64_t>(integer()) : *number);
+}
+
 double Value::number() const {
   switch (kind()) {
     case Kind::kBoolean:

@@ -63,8 +63,8 @@ class Value {
   // number (spaces, sign, digits, fraction, exponent), 0 without one. Of a date: its seconds. Of arrays and
   // maps: 0.
   std::int64_t integer() const;
-  // The low 32 bits of integer().
-  std::int32_t integer32() const { return static_cast<std::int32_t>(static_cast<std::uint64_t>(integer())); }
+  // The low 32 bits: of an integer, signed or unsigned, its own; else those of integer().
+  std::int32_t integer32() const;
   double number() const;
 
   // What "%@" prints: integers in decimal, booleans "1" and "0", doubles as textOf() below, texts as they
@@ -94,6 +94,7 @@ std::string textOf(const Value* value);
 
 inline bool booleanOf(const Value* value) { return value != nullptr && value->boolean(); }
 inline std::int64_t integerOf(const Value* value) { return value == nullptr ? 0 : value->integer(); }
+inline std::int32_t integer32Of(const Value* value) { return value == nullptr ? 0 : value->integer32(); }
 inline double numberOf(const Value* value) { return value == nullptr ? 0.0 : value->number(); }
 
 }  // namespace tonewerk

@@ -177,6 +177,8 @@ TEST(ValueConversionTest, ThirtyTwoBitReadingsKeepTheLowBits) {
   EXPECT_EQ(Value(0xFFFF'FFFF).integer32(), -1);
   EXPECT_EQ(Value(0x8000'0000).integer32(), std::numeric_limits<std::int32_t>::min());
   EXPECT_EQ(Value(kLeast).integer32(), 0);
+  EXPECT_EQ(Value((std::uint64_t{1} << 63U) + 5).integer32(), 5);  // beyond what integer() can say
+  EXPECT_EQ(Value(std::numeric_limits<std::uint64_t>::max()).integer32(), -1);
 }
 
 TEST(ValueConversionTest, AnAbsentValueReadsAsNothing) {

@@ -37,6 +37,10 @@ std::optional<Value> readDefault(std::string_view key) {
   return value;
 }
 
+std::int32_t bufferSizeOf(const TWReportingSessionMessage& message) {
+  return integer32Of(message.message.find(kSmallestBufferFrameSize));
+}
+
 // Whole microseconds; none for what is no time.
 std::chrono::microseconds waitTimeOf(double microseconds) {
   constexpr std::chrono::microseconds kMost = TWReportingSessionDPWorker::kMostWaitTime;
@@ -97,15 +101,13 @@ bool TWReportingSessionDPWorker::handleMessage(const TWReportingSessionMessage& 
   }
   debugLog(TWReportingDPLogCategory(),
            "Did not drop whirlcap, right conditions not met: buffer size : %d, time diff : %f, io cycle: %d",
-           integerOf(message.message.find(kSmallestBufferFrameSize)), now - lastMessageTime_,
-           integerOf(message.message.find(kIoCycle)));
+           bufferSizeOf(message), now - lastMessageTime_, integerOf(message.message.find(kIoCycle)));
   return false;
 }
 
 bool TWReportingSessionDPWorker::meetsConditions(const TWReportingSessionMessage& message, double now) const {
   if (!interestedInMessage(message)) return false;
-  const Value* bufferSize = message.message.find(kSmallestBufferFrameSize);
-  if ((bufferSize == nullptr ? 0 : bufferSize->integer32()) < settings().ioBufferSize) return false;
+  if (bufferSizeOf(message) < settings().ioBufferSize) return false;
   if (lastMessageTime_ != 0.0 && now - lastMessageTime_ <= kSecondsBetweenRequests) return false;
   return integerOf(message.message.find(kIoCycle)) >= settings().ioCycle;
 }

@@ -317,6 +317,17 @@ TEST_F(TWReportingSessionDPWorkerTest, AnOverloadTooSoonIsSaidToBe) {
                           "time diff : 4.000000, io cycle: 0"));
 }
 
+TEST_F(TWReportingSessionDPWorkerTest, ABufferSizeIsSaidAsItWasCompared) {
+  switchOn();
+  const auto worker = makeWorker();
+  test.log.clear();
+  worker->handleMessage(overload({{"smallest_buffer_frame_size", (std::int64_t{1} << 32) + 100}}));
+  worker->handleMessage(overload({{"smallest_buffer_frame_size", (std::uint64_t{1} << 63U) + 5}}));
+  EXPECT_THAT(lines(LogLevel::kDebug),
+              ElementsAre(HasSubstr("buffer size : 100,"), HasSubstr("buffer size : 5,")));
+  EXPECT_EQ(requests(), 0U);
+}
+
 TEST_F(TWReportingSessionDPWorkerTest, LaterChangesOfTheMessageDoNotReachTheRequest) {
   switchOn();
   const auto worker = makeWorker();

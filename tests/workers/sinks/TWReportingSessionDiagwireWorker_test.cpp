@@ -81,10 +81,11 @@ TEST_F(TWReportingSessionDiagwireWorkerTest, ATextEndsAtItsFirstZeroByte) {
 TEST_F(TWReportingSessionDiagwireWorkerTest, TheDurationIsTheLow32Bits) {
   handle({{"any_channel_silence_seconds", (std::int64_t{1} << 32) + 1}});
   handle({{"any_channel_silence_seconds", -1}});
+  handle({{"any_channel_silence_seconds", (std::uint64_t{1} << 63U) + 5}});
   handle({{"any_channel_silence_seconds", "12.7"}});
   std::vector<std::string> durations;
   for (const auto& post : test.diagwire.posts()) durations.push_back(post.fields.at(0));
-  EXPECT_THAT(durations, ElementsAre("2=1", "2=4294967295", "2=12"));
+  EXPECT_THAT(durations, ElementsAre("2=1", "2=4294967295", "2=5", "2=12"));
 }
 
 }  // namespace
