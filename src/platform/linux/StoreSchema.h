@@ -16,18 +16,19 @@ inline constexpr std::int64_t kStoreSchemaVersion = 1;
 // An analytics event's identifier is its row's times this, plus the place of its name among the row's names.
 inline constexpr std::int64_t kStoreNamesPerRow = 2;
 
-// A table that grows by rows with ever higher identifiers, and its column that says when a row was recorded.
+// A table that grows by rows with ever higher identifiers.
 struct StoreTable {
   std::string_view name;
-  std::string_view time;
+  std::string_view time;   // the column that says when a row was recorded
+  std::string_view bytes;  // an expression: what a row holds, without what is small in every row
 };
 
 inline constexpr std::array<StoreTable, 5> kStoreTables{{
-    {"analytics_row", "recorded_at"},
-    {"metric", "posted_at"},
-    {"power_event", "recorded_at"},
-    {"rtc_session", "started_at"},
-    {"rtc_message", "sent_at"},
+    {"analytics_row", "recorded_at", "length(CAST(payload AS BLOB))"},
+    {"metric", "posted_at", "length(record)"},
+    {"power_event", "recorded_at", "length(CAST(payload AS BLOB))"},
+    {"rtc_session", "started_at", "length(CAST(session_info AS BLOB)) + length(CAST(user_info AS BLOB))"},
+    {"rtc_message", "sent_at", "length(CAST(payload AS BLOB))"},
 }};
 
 // Makes all of it in an empty database, user_version included. One transaction.

@@ -2,7 +2,10 @@
 #include "platform/linux/StoreTrimmer.h"
 
 #include <algorithm>
+#include <array>
+#include <cstddef>
 #include <string>
+#include <vector>
 
 #include "platform/linux/StoreSchema.h"
 
@@ -12,8 +15,11 @@ namespace {
 constexpr std::int64_t kMinWalBytes = 256 << 10;
 constexpr std::int64_t kMaxWalBytes = 8 << 20;
 
-// Rows of each table that one statement deletes, and how many such rounds make a slice.
+// Rows of each table that one statement deletes for their age, rows of all tables that one round deletes for
+// their size, and how many such rounds make a slice.
 constexpr std::int64_t kChunkRows = 500;
+constexpr int kRowsPerRound = 2000;
+constexpr std::int64_t kBytesPerRound = 2 << 20;
 constexpr int kRoundsPerSlice = 16;
 // Pages that a slice gives back.
 constexpr std::int64_t kVacuumPages = 512;
@@ -22,10 +28,56 @@ constexpr std::int64_t kSpareFreePages = 64;
 
 // Oldest by identifier, which the clock cannot turn round. The newest row stays, so that its identifier is
 // not given out again: a reader that goes on behind the last one it saw misses nothing.
-std::string oldestChunk(const StoreTable& table, const std::string& columns) {
+std::string oldestRows(const StoreTable& table, const std::string& columns) {
   const std::string name(table.name);
-  return "SELECT " + columns + " FROM " + name + " WHERE id < (SELECT max(id) FROM " + name +
-         ") ORDER BY id LIMIT " + std::to_string(kChunkRows);
+  return "SELECT " + columns + " FROM " + name + " WHERE id < (SELECT max(id) FROM " + name + ") ORDER BY id";
+}
+
+std::string oldestChunk(const StoreTable& table) {
+  return oldestRows(table, "id") + " LIMIT " + std::to_string(kChunkRows);
+}
+
+// Goes through one table from its oldest row on.
+class OldestRows {
+ public:
+  OldestRows(SqliteDatabase& database, const StoreTable& table)
+      : select_(database.prepare(
+            oldestRows(table, "id, " + std::string(table.time) + ", " + std::string(table.bytes)))) {
+    step();
+  }
+
+  bool hasFailed() const { return at_ == SqliteStatement::Step::kFailed; }
+  bool hasRow() const { return at_ == SqliteStatement::Step::kRow; }
+  double time() const { return select_.number(1); }
+
+  // Goes on behind the current row, which is then among those to be deleted. The bytes that it holds.
+  std::int64_t pass() {
+    passed_ = select_.integer(0);
+    const std::int64_t bytes = select_.integer(2) + kLeastRowBytes;
+    step();
+    return bytes;
+  }
+  // The identifier up to which rows were passed; none is 0.
+  std::int64_t passed() const { return passed_; }
+
+ private:
+  // Identifier, time, lengths of the columns.
+  static constexpr std::int64_t kLeastRowBytes = 16;
+
+  void step() { at_ = select_.step(); }
+
+  SqliteStatement select_;
+  SqliteStatement::Step at_ = SqliteStatement::Step::kDone;
+  std::int64_t passed_ = 0;
+};
+
+// The one whose next row is the oldest of all; null where no row is left.
+OldestRows* oldestOf(std::vector<OldestRows>& tables) {
+  OldestRows* oldest = nullptr;
+  for (OldestRows& table : tables) {
+    if (table.hasRow() && (oldest == nullptr || table.time() < oldest->time())) oldest = &table;
+  }
+  return oldest;
 }
 
 }  // namespace
@@ -47,19 +99,18 @@ StoreTrimmer::Outcome StoreTrimmer::trimSize(const StoreBounds& bounds) {
 }
 
 StoreTrimmer::Outcome StoreTrimmer::deleteForSize(std::int64_t fileBytes) {
-  // What is deleted in one go makes room for a while: a 16th of the file.
-  const std::int64_t high = fileBytes - fileBytes / 16;
-  const std::int64_t low = high - fileBytes / 16;
+  // What is deleted in one go makes room for a while: a 32nd of the file.
+  const std::int64_t high = fileBytes - fileBytes / 32;
+  const std::int64_t low = high - fileBytes / 32;
   for (int round = 0; round < kRoundsPerSlice; ++round) {
     if (!measure()) return Outcome::kFailed;
     const std::int64_t used = (pages_ - freePages_) * pageBytes_;
     shrinking_ = used > (shrinking_ ? low : high);
     if (!shrinking_) return Outcome::kDone;
-    double end = 0.0;
-    bool found = false;
-    if (!findChunkEnd(end, found)) return Outcome::kFailed;
-    if (!found) return Outcome::kDone;  // nothing left to delete
-    if (deleteUpTo(end) < 0) return Outcome::kFailed;
+    // A row takes less than twice its bytes in pages, so half of what is over is never too much.
+    const std::int64_t deleted = deleteOldest(std::clamp((used - low) / 2, pageBytes_, kBytesPerRound));
+    if (deleted < 0) return Outcome::kFailed;
+    if (deleted == 0) return Outcome::kDone;  // nothing left to delete
   }
   return Outcome::kMoreToDo;
 }
@@ -97,7 +148,7 @@ std::int64_t StoreTrimmer::deleteUpTo(double time) {
   for (const StoreTable& table : kStoreTables) {
     SqliteStatement statement =
         database_.prepare("DELETE FROM " + std::string(table.name) + " WHERE " + std::string(table.time) +
-                          " <= ?1 AND id IN (" + oldestChunk(table, "id") + ")");
+                          " <= ?1 AND id IN (" + oldestChunk(table) + ")");
     statement.bind(1, time);
     if (!statement.run()) return -1;
     deleted += database_.changes();
@@ -105,18 +156,34 @@ std::int64_t StoreTrimmer::deleteUpTo(double time) {
   return deleted;
 }
 
-// The time up to which the oldest chunk of one table, the one with the oldest, can be deleted whole.
-bool StoreTrimmer::findChunkEnd(double& end, bool& found) {
-  found = false;
-  for (const StoreTable& table : kStoreTables) {
-    SqliteStatement statement = database_.prepare(
-        "SELECT max(time) FROM (" + oldestChunk(table, std::string(table.time) + " AS time") + ")");
-    if (statement.step() != SqliteStatement::Step::kRow) return false;
-    if (statement.isNull(0)) continue;
-    end = found ? std::min(end, statement.number(0)) : statement.number(0);
-    found = true;
+// Deletes the oldest rows of all tables until they come to `bytes`, or a round is full. The number of rows,
+// negative on failure.
+std::int64_t StoreTrimmer::deleteOldest(std::int64_t bytes) {
+  std::vector<OldestRows> tables;
+  for (const StoreTable& table : kStoreTables) tables.emplace_back(database_, table);
+  std::array<std::int64_t, kStoreTables.size()> ends{};
+  for (int row = 0; row < kRowsPerRound && bytes > 0; ++row) {
+    OldestRows* oldest = oldestOf(tables);
+    if (oldest == nullptr) break;
+    bytes -= oldest->pass();
   }
-  return true;
+  if (std::any_of(tables.begin(), tables.end(), [](const OldestRows& table) { return table.hasFailed(); })) {
+    return -1;
+  }
+  std::transform(tables.begin(), tables.end(), ends.begin(),
+                 [](const OldestRows& table) { return table.passed(); });
+  tables.clear();  // nothing may be read from a table whose rows go
+
+  std::int64_t deleted = 0;
+  for (std::size_t at = 0; at < ends.size(); ++at) {
+    if (ends[at] == 0) continue;
+    SqliteStatement statement =
+        database_.prepare("DELETE FROM " + std::string(kStoreTables[at].name) + " WHERE id <= ?1");
+    statement.bind(1, ends[at]);
+    if (!statement.run()) return -1;
+    deleted += database_.changes();
+  }
+  return deleted;
 }
 
 }  // namespace tonewerk

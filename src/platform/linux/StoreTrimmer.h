@@ -23,8 +23,10 @@ struct StoreBounds {
 // back to the file system. The writer's thread, outside transactions.
 //
 // Works in slices of some milliseconds, so that rows to write never wait long. At its bound the file keeps
-// its size: new rows take the pages of deleted ones. Age is looked at where the oldest rows are; rows
-// recorded while the clock was ahead can hold back those behind them until their own time has come.
+// its size: new rows take the pages of deleted ones, and what is in use stays between nine tenths of the
+// bound and all of it, unless a single row is larger than what lies between. Age is looked at where the
+// oldest rows are; rows recorded while the clock was ahead can hold back those behind them until their own
+// time has come.
 class StoreTrimmer {
  public:
   enum class Outcome { kDone, kMoreToDo, kFailed };
@@ -41,7 +43,7 @@ class StoreTrimmer {
   Outcome vacuum(std::int64_t fileBytes);
   bool measure();
   std::int64_t deleteUpTo(double time);
-  bool findChunkEnd(double& end, bool& found);
+  std::int64_t deleteOldest(std::int64_t bytes);
 
   SqliteDatabase& database_;
   std::int64_t pageBytes_ = 0;

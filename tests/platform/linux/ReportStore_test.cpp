@@ -2,10 +2,12 @@
 #include "platform/linux/ReportStore.h"
 
 #include <atomic>
+#include <cmath>
 #include <filesystem>
 #include <fstream>
 #include <gmock/gmock.h>
 #include <memory>
+#include <random>
 #include <signal.h>
 #include <string>
 #include <sys/resource.h>
@@ -597,6 +599,97 @@ TEST_F(ReportStoreTest, DeletesTheOldestPowerEventsToKeepTheFileWithinItsBound) 
               static_cast<double>(oldest), 1100.0);
   close();
   EXPECT_LE(std::filesystem::file_size(file()), 2U << 20);
+}
+
+class BoundedReportStoreTest : public ReportStoreTest {
+ protected:
+  void openBoundedTo(int megabytes) {
+    preferences_.configure("com.orvane.tonewerk.store", "max_megabytes", megabytes);
+    bounds_.bytes = std::int64_t{megabytes} << 20;
+    open();
+  }
+  // A row of that many bytes, now in one table, now in another.
+  void recordRow(int n, std::size_t bytes) {
+    clock_.advance(0.01);
+    const std::string text(bytes, 'x');
+    if (n % 3 == 0) {
+      recordPower(n, text);
+    } else {
+      record("com.orvane.n", {{"n", n}, {"text", text}});
+    }
+  }
+  // How much of the database file's part of the bound is in use.
+  double usedPart() {
+    const std::int64_t pages = number("PRAGMA page_count") - number("PRAGMA freelist_count");
+    return static_cast<double>(pages * number("PRAGMA page_size")) / static_cast<double>(bounds_.fileBytes());
+  }
+  // The numbers of all rows that are left, of both tables.
+  std::vector<std::int64_t> numbersLeft() {
+    std::vector<std::int64_t> numbers;
+    SqliteDatabase database;
+    EXPECT_TRUE(database.open(file(), SqliteDatabase::Mode::kReadOnly, kLongEnough)) << database.problem();
+    SqliteStatement select = database.prepare(
+        "SELECT payload ->> 'n' AS n FROM analytics_row UNION SELECT payload ->> 'n' FROM power_event "
+        "ORDER BY n");
+    while (select.step() == SqliteStatement::Step::kRow) numbers.push_back(select.integer(0));
+    return numbers;
+  }
+  // Nothing is missing between the oldest row and the last of `count`.
+  void expectTheNewestOf(int count) {
+    const std::vector<std::int64_t> numbers = numbersLeft();
+    ASSERT_FALSE(numbers.empty());
+    EXPECT_EQ(numbers.back(), count - 1);
+    EXPECT_EQ(numbers.back() - numbers.front(), static_cast<std::int64_t>(numbers.size()) - 1);
+  }
+
+  StoreBounds bounds_;
+};
+
+// 500 rows at once were deleted of each table, which with the smallest bound was all but the newest.
+TEST_F(BoundedReportStoreTest, KeepsAsManyRowsOfAKilobyteAsTheSmallestBoundHasRoomFor) {
+  openBoundedTo(1);
+  for (int n = 0; n < 3000; ++n) {
+    recordRow(n, 1000);
+    if (n % 100 != 99) continue;
+    ASSERT_TRUE(flush());
+    if (n < 1000) continue;
+    EXPECT_GE(usedPart(), 0.9) << "after " << n;
+    EXPECT_LE(usedPart(), 1.0) << "after " << n;
+  }
+  expectTheNewestOf(3000);
+  EXPECT_GT(numbersLeft().size(), 550U);
+}
+
+TEST_F(BoundedReportStoreTest, DeletesByBytesWhereRowsOfAHundredLieBetweenRowsOfHalfAMegabyte) {
+  openBoundedTo(16);
+  for (int n = 0; n < 6000; ++n) recordRow(n, n % 100 == 50 ? 500'000 : 100);
+  ASSERT_TRUE(flush());
+  EXPECT_GE(usedPart(), 0.9);
+  EXPECT_LE(usedPart(), 1.0);
+  expectTheNewestOf(6000);
+}
+
+TEST_F(BoundedReportStoreTest, WhatStaysIsBetweenNineTenthsOfTheBoundAndAllOfItWhateverTheRows) {
+  for (unsigned seed = 1; seed <= 8; ++seed) {
+    SCOPED_TRACE(seed);
+    std::mt19937 random(seed);
+    // Small rows mostly, now and then one of up to a 30th of the bound; just over a page is the worst fit.
+    std::uniform_real_distribution<double> logarithm(2.0, std::log(50'000.0));
+    openBoundedTo(2);
+    std::size_t written = 0;
+    int count = 0;
+    while (written < std::size_t{5} << 20) {
+      const std::size_t bytes = seed == 8 ? 8300 : static_cast<std::size_t>(std::exp(logarithm(random)));
+      written += bytes;
+      recordRow(count++, bytes);
+    }
+    ASSERT_TRUE(flush());
+    EXPECT_GE(usedPart(), 0.9);
+    EXPECT_LE(usedPart(), 1.0);
+    expectTheNewestOf(count);
+    close();
+    std::filesystem::remove_all(directory_);
+  }
 }
 
 TEST_F(ReportStoreTest, LeavesOutBoundsThatAreNoNumberFromOne) {
