@@ -8,6 +8,7 @@
 #include <unistd.h>
 
 #include "platform/linux/FileDescriptor.h"
+#include "platform/linux/Ownership.h"
 #include "platform/linux/TextFile.h"
 
 namespace tonewerk {
@@ -29,6 +30,7 @@ std::error_code writeSynced(int directory, const std::string& name, std::string_
   const FileDescriptor file(
       openat(directory, name.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0644));
   if (!file) return lastSystemError();
+  if (const std::error_code error = giveToOwnerOf(directory, file.get())) return error;
   if (const std::error_code error = writeAll(file.get(), text)) return error;
   return fsync(file.get()) == 0 ? std::error_code() : lastSystemError();
 }

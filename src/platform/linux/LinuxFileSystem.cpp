@@ -16,6 +16,7 @@
 #include <utility>
 
 #include "platform/linux/FileDescriptor.h"
+#include "platform/linux/Ownership.h"
 #include "platform/linux/TextFile.h"
 
 namespace tonewerk {
@@ -34,11 +35,19 @@ bool isDirectory(const std::string& path) {
   return stat(path.c_str(), &status) == 0 && S_ISDIR(status.st_mode);
 }
 
+// What was just made at `path` gets its mode, of which the process's mask has taken bits away, and its owner.
+std::error_code finishDirectory(const std::string& path, mode_t mode) {
+  const FileDescriptor made(open(path.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
+  if (!made) return lastSystemError();
+  const FileDescriptor parent(openat(made.get(), "..", O_PATH | O_DIRECTORY | O_CLOEXEC));
+  if (!parent) return lastSystemError();
+  if (const std::error_code error = giveToOwnerOf(parent.get(), made.get())) return error;
+  return fchmod(made.get(), mode) == 0 ? std::error_code() : lastSystemError();
+}
+
 std::error_code createDirectory(const std::string& path, mode_t mode) {
-  if (mkdir(path.c_str(), mode) == 0) {
-    // The process's mask has taken bits away.
-    return chmod(path.c_str(), mode) == 0 ? std::error_code() : lastSystemError();
-  }
+  // Readable and open to us until it has its mode.
+  if (mkdir(path.c_str(), mode | S_IRWXU) == 0) return finishDirectory(path, mode);
   const std::error_code error = lastSystemError();
   if (isDirectory(path)) return {};
   return error == std::errc::file_exists ? std::make_error_code(std::errc::not_a_directory) : error;

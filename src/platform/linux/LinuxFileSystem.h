@@ -17,6 +17,7 @@ namespace tonewerk {
 // user's and has no lock: what processes left that were killed. So other processes may write there, too.
 class LinuxFileSystem final : public FileSystem {
  public:
+  // What root makes belongs to whom the directory around it belongs to.
   std::error_code createDirectories(const std::string& path, unsigned mode) override;
   // The file is readable by everybody whom the directory lets in, writable by its owner (0644).
   std::unique_ptr<NewFile> createFile(const std::string& directory, const std::string& name,

@@ -8,18 +8,20 @@
 #include <charconv>
 #include <cstdio>
 #include <fcntl.h>
-#include <filesystem>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include "platform/NotificationHandlers.h"
 #include "platform/linux/FileDescriptor.h"
+#include "platform/linux/LinuxFileSystem.h"
+#include "platform/linux/Ownership.h"
 #include "platform/linux/TextFile.h"
 
 namespace tonewerk {
 namespace {
 
 constexpr mode_t kFileMode = 0644;
+constexpr unsigned kDirectoryMode = 0755;
 
 // Others may put anything in a file's place: a pipe must not hold us, a link must not lead us away.
 constexpr int kCareful = O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC;
@@ -68,9 +70,12 @@ std::string temporaryName() {
   return ".new-" + std::to_string(getpid()) + "-" + std::to_string(++count);
 }
 
-std::error_code writeNewFile(const std::string& path, std::string_view text) {
+std::error_code writeNewFile(const std::string& directory, const std::string& path, std::string_view text) {
+  const FileDescriptor parent(open(directory.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
   const FileDescriptor file(open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | kCareful, kFileMode));
-  if (!file) return lastSystemError();
+  if (!parent || !file) return lastSystemError();
+  // The daemon posts, too, for which it opens the file for writing.
+  if (const std::error_code error = giveToOwnerOf(parent.get(), file.get())) return error;
   const ssize_t written = write(file.get(), text.data(), text.size());
   if (written < 0) return lastSystemError();
   // So few bytes are written at once or not at all.
@@ -102,13 +107,12 @@ std::optional<std::uint64_t> NotificationFiles::state(std::string_view name, std
 
 template <typename Place>
 std::error_code NotificationFiles::put(std::uint64_t state, Place place) const {
-  std::error_code error;
-  std::filesystem::create_directories(directory_, error);
+  std::error_code error = LinuxFileSystem().createDirectories(directory_, kDirectoryMode);
   if (error) return error;
   const std::string path = pathOf(temporaryName());
   // What a crash left behind.
   unlink(path.c_str());
-  error = writeNewFile(path, std::to_string(state) + "\n");
+  error = writeNewFile(directory_, path, std::to_string(state) + "\n");
   if (!error && place(path.c_str()) != 0) error = lastSystemError();
   unlink(path.c_str());
   return error;

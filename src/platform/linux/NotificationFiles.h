@@ -29,7 +29,8 @@ class NotificationFiles {
   std::optional<std::uint64_t> state(std::string_view name, std::error_code& error) const;
 
   // Posts the name with the state it has, whatever its file holds; a name without a file gets the state 0.
-  // These two make the directory where it is missing.
+  // These two make the directory where it is missing. What root makes belongs to whom the directory around it
+  // belongs to.
   [[nodiscard]] std::error_code post(std::string_view name) const;
   // Posts the name with a new state. Readers see the old file or the new one.
   [[nodiscard]] std::error_code post(std::string_view name, std::uint64_t state) const;

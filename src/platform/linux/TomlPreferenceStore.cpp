@@ -10,6 +10,7 @@
 #include "platform/linux/DurableFile.h"
 #include "platform/linux/FileDescriptor.h"
 #include "platform/linux/LinuxFileSystem.h"
+#include "platform/linux/Ownership.h"
 #include "platform/linux/TextFile.h"
 #include "platform/linux/TomlText.h"
 
@@ -58,10 +59,23 @@ void leaveOutWhatIsConfigured(ValueMap& written, const ValueMap& configured) {
   }
 }
 
+// The lock file, made where it is missing.
+FileDescriptor openLock(const std::string& directory, std::error_code& error) {
+  constexpr const char* kName = ".lock";
+  constexpr int kFlags = O_RDWR | O_NOFOLLOW | O_CLOEXEC;
+  const FileDescriptor parent(open(directory.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
+  FileDescriptor made(openat(parent.get(), kName, kFlags | O_CREAT | O_EXCL, 0600));
+  if (made) {
+    error = giveToOwnerOf(parent.get(), made.get());
+    return made;
+  }
+  return FileDescriptor(openat(parent.get(), kName, kFlags));
+}
+
 // Held by one writer at a time, of whatever process. Let go when the file is closed.
 FileDescriptor lockWriters(const std::string& directory, std::error_code& error) {
-  const std::string path = directory + "/.lock";
-  FileDescriptor lock(open(path.c_str(), O_RDWR | O_CREAT | O_NOFOLLOW | O_CLOEXEC, 0600));
+  FileDescriptor lock = openLock(directory, error);
+  if (error) return {};
   int locked = -1;
   if (lock) {
     do {

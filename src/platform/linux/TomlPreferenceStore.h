@@ -15,7 +15,8 @@ namespace tonewerk {
 // <state directory>/<domain>.toml. Only the latter is written, and holds only what differs from the former.
 //
 // A read looks at both files (two stat() calls) and reads what changed. A write holds a lock file, so that no
-// writer in this or another process loses another's keys, and ends after the new file is on the disk.
+// writer in this or another process loses another's keys, and ends after the new file is on the disk. What
+// root makes belongs to whom the directory around it belongs to, so that the daemon can go on writing there.
 //
 // A file that does not parse is read as empty. If it is the written one, writes to its domain fail
 // (std::errc::invalid_argument) until somebody has mended or removed it.

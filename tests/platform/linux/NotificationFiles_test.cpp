@@ -8,7 +8,9 @@
 #include <limits>
 #include <string>
 #include <sys/stat.h>
+#include <unistd.h>
 
+#include "support/Stranger.h"
 #include "support/TemporaryDirectory.h"
 
 namespace tonewerk {
@@ -130,6 +132,24 @@ TEST_F(NotificationFilesTest, AFileInTheDirectorysPlaceIsAFailure) {
   EXPECT_TRUE(files.post("b"));
   EXPECT_TRUE(files.post("b", 1));
   EXPECT_EQ(state("b"), std::nullopt);
+}
+
+TEST_F(NotificationFilesTest, WhatRootPostsTheDirectorysOwnerCanPostAgain) {
+  if (geteuid() != 0) GTEST_SKIP() << "only root can be root";
+  const std::string runtime = directory.path("a");
+  std::filesystem::create_directory(runtime);
+  ASSERT_EQ(chown(directory.path().c_str(), kStranger, kStranger), 0);
+  ASSERT_EQ(chown(runtime.c_str(), kStranger, kStranger), 0);
+  EXPECT_FALSE(files.post("stated", 5));
+  EXPECT_FALSE(files.post("unstated"));
+  runAsStranger([this] {
+    EXPECT_FALSE(files.post("stated"));
+    EXPECT_FALSE(files.post("unstated"));
+    EXPECT_FALSE(files.post("unstated", 7));
+    EXPECT_FALSE(files.post("another"));
+  });
+  EXPECT_EQ(state("stated"), 5);
+  EXPECT_EQ(state("unstated"), 7);
 }
 
 }  // namespace

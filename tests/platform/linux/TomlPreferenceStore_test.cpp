@@ -9,9 +9,11 @@
 #include <sys/wait.h>
 #include <thread>
 #include <unistd.h>
+#include <utility>
 #include <vector>
 
 #include "support/MemoryLog.h"
+#include "support/Stranger.h"
 #include "support/TemporaryDirectory.h"
 
 namespace tonewerk {
@@ -177,6 +179,73 @@ TEST_F(TomlPreferenceStoreTest, APipeInAFilesPlaceHoldsNobody) {
   EXPECT_EQ(store_.read(kDomain, "a"), std::nullopt);
   EXPECT_THAT(log_.textsOf("twrs", LogLevel::kError), SizeIs(1));
   EXPECT_TRUE(store_.write(kDomain, "a", 1));
+}
+
+// Root who wrote one preference of the daemon's once took the whole directory from it.
+class PreferencesOfRootTest : public TomlPreferenceStoreTest {
+ protected:
+  void SetUp() override {
+    if (geteuid() != 0) GTEST_SKIP() << "only root can be root";
+    std::filesystem::create_directory(state_);
+    ASSERT_EQ(chown(directory_.path().c_str(), kStranger, kStranger), 0);
+    ASSERT_EQ(chown(state_.c_str(), kStranger, kStranger), 0);
+  }
+
+  static std::pair<uid_t, gid_t> ownerOf(const std::string& path) {
+    struct stat status {};
+    EXPECT_EQ(lstat(path.c_str(), &status), 0) << path;
+    return {status.st_uid, status.st_gid};
+  }
+
+  static constexpr std::pair<uid_t, gid_t> kDaemons{kStranger, kStranger};
+  static constexpr std::pair<uid_t, gid_t> kRoots{0, 0};
+
+  const std::string state_ = directory_.path("daemon");
+  const std::string preferences_ = state_ + "/preferences";
+  TomlPreferenceStore roots_{directory_.path("configuration"), preferences_, category_};
+};
+
+TEST_F(PreferencesOfRootTest, WhatRootWritesIsTheStateDirectorysOwners) {
+  EXPECT_FALSE(roots_.write(kDomain, "a", 1));
+  for (const char* made : {"", "/.lock", "/com.orvane.test.toml"}) {
+    EXPECT_EQ(ownerOf(preferences_ + made), kDaemons) << made;
+  }
+}
+
+TEST_F(PreferencesOfRootTest, TheDaemonGoesOnWritingWhereRootHasWritten) {
+  EXPECT_FALSE(roots_.write(kDomain, "a", 1));
+  runAsStranger([&] {
+    TomlPreferenceStore daemons(directory_.path("configuration"), preferences_, category_);
+    std::string problem;
+    EXPECT_FALSE(daemons.write(kDomain, "b", 2, &problem)) << problem;
+    EXPECT_FALSE(daemons.write("com.orvane.other", "c", 3, &problem)) << problem;
+  });
+  EXPECT_EQ(roots_.read(kDomain, "a"), Value(1));
+  EXPECT_EQ(roots_.read(kDomain, "b"), Value(2));
+}
+
+TEST_F(PreferencesOfRootTest, NothingIsGivenAwayThatWasThereBefore) {
+  const std::string secret = directory_.path("secret");
+  write(secret, "root's\n");
+  std::filesystem::create_directory(preferences_);
+  ASSERT_EQ(chown(preferences_.c_str(), kStranger, kStranger), 0);
+  std::filesystem::create_hard_link(secret, preferences_ + "/.lock");
+  std::filesystem::create_hard_link(secret, preferences_ + "/com.orvane.test.toml.new");
+  EXPECT_FALSE(roots_.write(kDomain, "a", 1));
+  EXPECT_EQ(ownerOf(secret), kRoots);
+  EXPECT_EQ(contentsOf(secret), "root's\n");
+  EXPECT_EQ(ownerOf(preferences_ + "/com.orvane.test.toml"), kDaemons);
+}
+
+TEST_F(PreferencesOfRootTest, ALinkInTheLocksPlaceIsNotFollowed) {
+  const std::string secret = directory_.path("secret");
+  write(secret, "root's\n");
+  std::filesystem::create_directory(preferences_);
+  std::filesystem::create_symlink(secret, preferences_ + "/.lock");
+  std::string problem;
+  EXPECT_TRUE(roots_.write(kDomain, "a", 1, &problem));
+  EXPECT_THAT(problem, HasSubstr(".lock"));
+  EXPECT_EQ(ownerOf(secret), kRoots);
 }
 
 }  // namespace
