@@ -24,7 +24,7 @@ namespace {
 
 constexpr std::uint32_t kFileEvents = IN_CLOSE | IN_MOVED_TO | IN_CREATE | IN_OPEN | IN_MODIFY;
 constexpr std::uint32_t kSelfEvents = IN_DELETE_SELF | IN_MOVE_SELF;
-constexpr std::uint32_t kEntryEvents = IN_CREATE | IN_MOVED_TO | IN_MOVED_FROM | IN_DELETE;
+constexpr std::uint32_t kEntryEvents = IN_CREATE | IN_MOVED_TO | IN_MOVED_FROM | IN_DELETE | IN_ATTRIB;
 
 constexpr std::size_t kBufferBytes = std::size_t{16} << 10;
 
@@ -44,8 +44,6 @@ struct DirectoryWatcher::Event {
 DirectoryWatcher::DirectoryWatcher(std::string directory, FileHandler onFile,
                                    std::function<void()> onEverything, const LogCategory& log)
     : directory_(std::move(directory)),
-      parent_(std::filesystem::path(directory_).parent_path().string()),
-      name_(std::filesystem::path(directory_).filename().string()),
       onFile_(std::move(onFile)),
       onEverything_(std::move(onEverything)),
       log_(log),
@@ -105,17 +103,17 @@ void DirectoryWatcher::readEvents() {
 
 void DirectoryWatcher::handle(const Event& event) {
   const bool isOverflow = (event.what & IN_Q_OVERFLOW) != 0;
-  const bool isParent = event.watch == parentWatch_;
-  if (!isOverflow && !isParent && event.watch != directoryWatch_) return;  // of a watch given up since
+  const bool isAncestor = event.watch == ancestorWatch_;
+  if (!isOverflow && !isAncestor && event.watch != directoryWatch_) return;  // of a watch given up since
 
   const bool isSelf = (event.what & (kSelfEvents | IN_IGNORED)) != 0;
-  if (isOverflow || isSelf || (isParent && event.name == name_)) {
+  if (isOverflow || isSelf || (isAncestor && event.name == awaited_)) {
     // What was lost with an overflow may be a change of the directory itself.
     attach();
     onEverything_();
     return;
   }
-  if (!isParent && (event.what & IN_ISDIR) == 0) handleFile(event);
+  if (!isAncestor && (event.what & IN_ISDIR) == 0) handleFile(event);
 }
 
 void DirectoryWatcher::handleFile(const Event& event) {
@@ -148,20 +146,41 @@ int DirectoryWatcher::watch(const std::string& path, std::uint32_t events, int& 
 
 void DirectoryWatcher::attach() {
   // Fails for one whose directory is gone; the kernel has removed it then.
-  for (const int old : {directoryWatch_, parentWatch_}) {
+  for (const int old : {directoryWatch_, ancestorWatch_}) {
     if (old >= 0) inotify_rm_watch(inotify_.get(), old);
   }
   unopened_.clear();
   opened_.clear();
-  // The parent first, so that a directory which comes between the two is seen.
-  int parentFailure = 0;
+  // The ancestor first, so that a directory which comes between the two is seen.
+  const bool hasAncestor = watchAncestor();
   int failure = 0;
-  parentWatch_ = watch(parent_, kEntryEvents | kSelfEvents, parentFailure);
   directoryWatch_ = watch(directory_, kFileEvents | kSelfEvents, failure);
-  const bool isAwaited = parentWatch_ >= 0 && (failure == ENOENT || failure == ENOTDIR);
+  const bool isMissing = failure == ENOENT || failure == ENOTDIR;
+  const bool isAwaited = hasAncestor && (isMissing || failure == EACCES);
   mustRetry_ = directoryWatch_ < 0 && !isAwaited;
   if (!mustRetry_) retry_ = kFirstRetry;
-  noteProblem(mustRetry_ && failure != ENOENT ? failure : 0);
+  noteProblem(isMissing ? 0 : failure);
+}
+
+bool DirectoryWatcher::watchAncestor() {
+  std::filesystem::path below = directory_;
+  for (;;) {
+    const std::filesystem::path ancestor = below.parent_path();
+    int failure = 0;
+    ancestorWatch_ = watch(ancestor.string(), kEntryEvents | kSelfEvents, failure);
+    awaited_ = below.filename().string();
+    if (ancestorWatch_ < 0) {
+      if ((failure != ENOENT && failure != ENOTDIR) || ancestor == below || ancestor.empty()) return false;
+      below = ancestor;
+      continue;
+    }
+    // What it is watched for may have come just before.
+    std::error_code error;
+    const bool isLate = below != directory_ && std::filesystem::is_directory(below, error);
+    if (!isLate) return true;
+    inotify_rm_watch(inotify_.get(), ancestorWatch_);
+    below = directory_;
+  }
 }
 
 void DirectoryWatcher::noteProblem(int failure) {

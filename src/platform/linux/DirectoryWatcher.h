@@ -26,8 +26,9 @@ namespace tonewerk {
 // kernel has nothing more to say of it, or nothing but that it was opened and closed unwritten. Else it will
 // be closed after writing, and told of then.
 //
-// The directory is known by its path. It need not be there: its parent is watched for its coming. Where
-// neither is, or where watching fails, it is tried again at intervals that grow from a second to a minute.
+// The directory is known by its path. It need not be there: the nearest directory above it that is there is
+// watched for its coming, or for its becoming readable. Only where the system refuses that is it tried again,
+// at intervals that grow from a second to a minute.
 class DirectoryWatcher {
  public:
   using FileHandler = std::function<void(std::string_view name)>;
@@ -59,14 +60,14 @@ class DirectoryWatcher {
   void tellOfLinks();
   // Watches what the paths lead to now, instead of what they led to before.
   void attach();
+  // Watches the nearest directory above that is there. False when there is none to be watched.
+  bool watchAncestor();
   int watch(const std::string& path, std::uint32_t events, int& failure);
   void noteProblem(int failure);
   // How long poll() may wait, in milliseconds; -1 for ever.
   int patience();
 
   const std::string directory_;
-  const std::string parent_;
-  const std::string name_;  // of the directory in its parent
   const FileHandler onFile_;
   const std::function<void()> onEverything_;
   const LogCategory& log_;
@@ -75,7 +76,8 @@ class DirectoryWatcher {
 
   // The watcher's thread, after the constructor.
   int directoryWatch_ = -1;
-  int parentWatch_ = -1;
+  int ancestorWatch_ = -1;
+  std::string awaited_;  // the way to the directory begins with this entry of the ancestor
   // Files that came and were not empty, while it is not known whether they were linked or are being written.
   std::set<std::string, std::less<>> unopened_;  // nobody has them open, as far as the kernel has said
   std::set<std::string, std::less<>> opened_;    // somebody has

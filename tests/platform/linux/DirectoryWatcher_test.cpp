@@ -98,7 +98,7 @@ class DirectoryWatcherTest : public ::testing::Test {
 
   TemporaryDirectory root;
   const std::string parent = root.path("parent");
-  const std::string watched = parent + "/watched";
+  std::string watched = parent + "/watched";
   MemoryLog log;
   LogCategory category{log, "com.orvane.tonewerk", "twrs"};
   std::mutex mutex;
@@ -368,6 +368,31 @@ TEST_F(DirectoryWatcherTest, ADirectoryMayComeWithItsParent) {
   EXPECT_TRUE(waitFor(kEverything));
   write(path("a"));
   EXPECT_TRUE(waitFor("a"));
+}
+
+TEST_F(DirectoryWatcherTest, ADirectoryMayComeLevelByLevelWithAPauseAtEach) {
+  watched = root.path("a/b/c/d");
+  watch();
+  for (const char* level : {"a", "a/b", "a/b/c"}) {
+    fs::create_directory(root.path(level));
+    // Told of when the watcher has gone down to it.
+    EXPECT_TRUE(waitFor(kEverything)) << level;
+  }
+  fs::create_directory(watched);
+  EXPECT_TRUE(isFollowed());
+  EXPECT_THAT(log.lines(), IsEmpty());
+}
+
+TEST_F(DirectoryWatcherTest, AllDirectoriesAboveMayGoAndComeBack) {
+  watched = root.path("a/b/c/d");
+  fs::create_directories(watched);
+  watch();
+  for (int round = 0; round < 3; ++round) {
+    fs::remove_all(root.path("a"));
+    EXPECT_TRUE(waitFor(kEverything));
+    fs::create_directories(watched);
+    EXPECT_TRUE(isFollowed());
+  }
 }
 
 TEST_F(DirectoryWatcherTest, AFileInTheDirectorysPlaceIsWaitedOut) {
