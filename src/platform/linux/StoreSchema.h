@@ -21,14 +21,16 @@ struct StoreTable {
   std::string_view name;
   std::string_view time;   // the column that says when a row was recorded
   std::string_view bytes;  // an expression: what a row holds, without what is small in every row
+  std::string_view empty;  // an assignment: it holds nothing of that any more
 };
 
 inline constexpr std::array<StoreTable, 5> kStoreTables{{
-    {"analytics_row", "recorded_at", "length(CAST(payload AS BLOB))"},
-    {"metric", "posted_at", "length(record)"},
-    {"power_event", "recorded_at", "length(CAST(payload AS BLOB))"},
-    {"rtc_session", "started_at", "length(CAST(session_info AS BLOB)) + length(CAST(user_info AS BLOB))"},
-    {"rtc_message", "sent_at", "length(CAST(payload AS BLOB))"},
+    {"analytics_row", "recorded_at", "length(CAST(payload AS BLOB))", "payload = '{}'"},
+    {"metric", "posted_at", "length(record)", "record = x''"},
+    {"power_event", "recorded_at", "length(CAST(payload AS BLOB))", "payload = '{}'"},
+    {"rtc_session", "started_at", "length(CAST(session_info AS BLOB)) + length(CAST(user_info AS BLOB))",
+     "session_info = '{}', user_info = '{}'"},
+    {"rtc_message", "sent_at", "length(CAST(payload AS BLOB))", "payload = '{}'"},
 }};
 
 // Makes all of it in an empty database, user_version included. One transaction.

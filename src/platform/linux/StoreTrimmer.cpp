@@ -107,6 +107,9 @@ StoreTrimmer::Outcome StoreTrimmer::deleteForSize(std::int64_t fileBytes) {
     const std::int64_t used = (pages_ - freePages_) * pageBytes_;
     shrinking_ = used > (shrinking_ ? low : high);
     if (!shrinking_) return Outcome::kDone;
+    const std::optional<bool> hasEmptied = emptyNewest(low);
+    if (!hasEmptied) return Outcome::kFailed;
+    if (*hasEmptied) continue;
     // A row takes less than twice its bytes in pages, so half of what is over is never too much.
     const std::int64_t deleted = deleteOldest(std::clamp((used - low) / 2, pageBytes_, kBytesPerRound));
     if (deleted < 0) return Outcome::kFailed;
@@ -156,10 +159,37 @@ std::int64_t StoreTrimmer::deleteUpTo(double time) {
   return deleted;
 }
 
+// The newest rows, which are never deleted, may be too large for the bound. The largest of them is then
+// emptied, or all others would be deleted in vain. Whether one was; none on failure.
+std::optional<bool> StoreTrimmer::emptyNewest(std::int64_t mostBytes) {
+  std::int64_t sum = 0;
+  std::int64_t most = 0;
+  std::string emptyLargest;
+  for (const StoreTable& table : kStoreTables) {
+    const std::string name(table.name);
+    const std::string newest = " WHERE id = (SELECT max(id) FROM " + name + ")";
+    std::string question = "SELECT ";
+    question.append(table.bytes).append(" FROM ").append(name).append(newest);
+    SqliteStatement select = database_.prepare(question);
+    const SqliteStatement::Step step = select.step();
+    if (step == SqliteStatement::Step::kFailed) return std::nullopt;
+    if (step == SqliteStatement::Step::kDone) continue;
+    const std::int64_t held = select.integer(0);
+    sum += held;
+    if (held <= most) continue;
+    most = held;
+    emptyLargest = "UPDATE ";
+    emptyLargest.append(name).append(" SET ").append(table.empty).append(newest);
+  }
+  if (sum <= mostBytes) return false;
+  return database_.run(emptyLargest) ? std::optional(true) : std::nullopt;
+}
+
 // Deletes the oldest rows of all tables until they come to `bytes`, or a round is full. The number of rows,
 // negative on failure.
 std::int64_t StoreTrimmer::deleteOldest(std::int64_t bytes) {
   std::vector<OldestRows> tables;
+  tables.reserve(kStoreTables.size());
   for (const StoreTable& table : kStoreTables) tables.emplace_back(database_, table);
   std::array<std::int64_t, kStoreTables.size()> ends{};
   for (int row = 0; row < kRowsPerRound && bytes > 0; ++row) {

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <cstdint>
+#include <optional>
 
 #include "platform/linux/SqliteDatabase.h"
 
@@ -44,6 +45,7 @@ class StoreTrimmer {
   bool measure();
   std::int64_t deleteUpTo(double time);
   std::int64_t deleteOldest(std::int64_t bytes);
+  std::optional<bool> emptyNewest(std::int64_t mostBytes);
 
   SqliteDatabase& database_;
   std::int64_t pageBytes_ = 0;

@@ -669,6 +669,19 @@ TEST_F(BoundedReportStoreTest, DeletesByBytesWhereRowsOfAHundredLieBetweenRowsOf
   expectTheNewestOf(6000);
 }
 
+// A summary of a whole session may be larger than a small bound, and is the newest row of its table for long.
+TEST_F(BoundedReportStoreTest, ANewestRowThatTheBoundHasNoRoomForIsEmptiedAndCostsNoOthers) {
+  openBoundedTo(1);
+  for (int n = 0; n < 400; ++n) record("com.orvane.n", {{"n", n}, {"text", std::string(1000, 'x')}});
+  recordPower(1000, std::string(3'000'000, 'x'));
+  ASSERT_TRUE(flush());
+  for (int n = 400; n < 600; ++n) record("com.orvane.n", {{"n", n}, {"text", std::string(1000, 'x')}});
+  ASSERT_TRUE(flush());
+  EXPECT_LE(usedPart(), 1.0);
+  EXPECT_GT(events().size(), 500U);
+  EXPECT_EQ(number("SELECT count(*) FROM power_event WHERE payload = '{}'"), 1);
+}
+
 TEST_F(BoundedReportStoreTest, WhatStaysIsBetweenNineTenthsOfTheBoundAndAllOfItWhateverTheRows) {
   for (unsigned seed = 1; seed <= 8; ++seed) {
     SCOPED_TRACE(seed);
