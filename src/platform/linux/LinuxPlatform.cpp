@@ -19,6 +19,7 @@
 #include "platform/linux/LinuxSystemInformation.h"
 #include "platform/linux/LinuxWhirlcapRequest.h"
 #include "platform/linux/NlohmannJsonService.h"
+#include "platform/linux/PreferenceWatcher.h"
 #include "platform/linux/RecentLines.h"
 #include "platform/linux/RememberingLog.h"
 #include "platform/linux/StandardCollectors.h"
@@ -73,6 +74,7 @@ struct LinuxPlatform::Adapters {
   LinuxSystemInformation system{clock};
   TomlDeviceFacts deviceFacts;
   TomlPreferenceStore preferences;
+  PreferenceWatcher preferenceWatcher{preferences, category};
   InotifyNotificationService notifications;
   LinuxFileSystem files;
   NlohmannJsonService json;

@@ -25,21 +25,22 @@ void TomlFile::read() {
     problem_.clear();
     return;
   }
-  if (error) return fail(path_ + ": " + error.message());
+  if (error) return fail(path_ + ": " + error.message(), std::nullopt);
 
   const FileStamp stamp = FileStamp::of(status);
   if (stamp.isSettled()) stamp_ = stamp;
   std::string problem;
   std::optional<ValueMap> values = parseToml(text, problem);
-  if (!values) return fail(path_ + ":" + problem);
+  if (!values) return fail(path_ + ":" + problem, stamp);
   values_ = std::move(*values);
   problem_.clear();
 }
 
-void TomlFile::fail(const std::string& problem) {
+void TomlFile::fail(const std::string& problem, const std::optional<FileStamp>& found) {
   values_ = {};
-  if (problem == problem_) return;
+  if (problem == problem_ && found == saidOf_) return;
   problem_ = problem;
+  saidOf_ = found;
   errorLog(log_, "%s (read as empty)", problem_);
 }
 

@@ -18,7 +18,7 @@ class TomlFile {
   TomlFile(std::string path, const LogCategory& log) : path_(std::move(path)), log_(log) {}
 
   // Looks at the file, and reads it unless it is for certain the one that was read last. A file that cannot
-  // be read or does not parse is logged with line and column, once until its state changes.
+  // be read or does not parse is logged with line and column, once until it is written again.
   void refresh();
 
   // As of the last refresh(). Empty when there is no such file and when problem() says why it cannot be read.
@@ -28,13 +28,15 @@ class TomlFile {
 
  private:
   void read();
-  void fail(const std::string& problem);
+  // `found` is the file that has the problem, none where it could not be opened.
+  void fail(const std::string& problem, const std::optional<FileStamp>& found);
 
   const std::string path_;
   const LogCategory& log_;
   std::optional<FileStamp> stamp_;  // of what was read; none when it cannot be trusted to tell a later state
   ValueMap values_;
   std::string problem_;
+  std::optional<FileStamp> saidOf_;  // the file whose problem was logged last
 };
 
 }  // namespace tonewerk

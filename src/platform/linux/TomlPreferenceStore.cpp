@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <cerrno>
 #include <fcntl.h>
+#include <filesystem>
 #include <functional>
 #include <sys/file.h>
 
@@ -109,6 +110,21 @@ TomlPreferenceStore::Contents TomlPreferenceStore::contentsOf(std::string_view d
   held.configured.refresh();
   held.written.refresh();
   return {held.configured.values(), held.written.values(), held.written.problem()};
+}
+
+void TomlPreferenceStore::checkFile(std::string_view fileName) const {
+  if (!fileName.ends_with(kEnding)) return;
+  contentsOf(fileName.substr(0, fileName.size() - kEnding.size()));
+}
+
+void TomlPreferenceStore::checkAllFiles() const {
+  for (const std::string& directory : {configurationDirectory_, stateDirectory_}) {
+    std::error_code error;  // there may be none
+    std::filesystem::directory_iterator entry(directory, error);
+    for (const std::filesystem::directory_iterator end; !error && entry != end; entry.increment(error)) {
+      checkFile(entry->path().filename().string());
+    }
+  }
 }
 
 std::optional<Value> TomlPreferenceStore::read(std::string_view domain, std::string_view key) const {

@@ -36,6 +36,14 @@ class TomlPreferenceStore final : public PreferenceStore {
   std::error_code remove(std::string_view domain, std::string_view key,
                          std::string* problem = nullptr) override;
 
+  // Read their files where they changed, so that what is wrong with them is logged now and not when somebody
+  // needs them. A name that is no preference file's is nobody's.
+  void checkFile(std::string_view fileName) const;
+  void checkAllFiles() const;
+
+  const std::string& configurationDirectory() const { return configurationDirectory_; }
+  const std::string& stateDirectory() const { return stateDirectory_; }
+
  private:
   struct Domain {
     TomlFile configured;

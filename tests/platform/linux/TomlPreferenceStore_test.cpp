@@ -248,5 +248,33 @@ TEST_F(PreferencesOfRootTest, ALinkInTheLocksPlaceIsNotFollowed) {
   EXPECT_EQ(ownerOf(secret), kRoots);
 }
 
+TEST_F(TomlPreferenceStoreTest, AFileThatStillDoesNotParseIsLoggedAgainWhenItIsWrittenAgain) {
+  write(configured(), "a = \n");
+  EXPECT_EQ(store_.read(kDomain, "a"), std::nullopt);
+  write(configured(), "a = \nb = 1\n");
+  EXPECT_EQ(store_.read(kDomain, "a"), std::nullopt);
+  EXPECT_EQ(store_.read(kDomain, "a"), std::nullopt);
+  EXPECT_THAT(log_.textsOf("twrs", LogLevel::kError), SizeIs(2));
+}
+
+TEST_F(TomlPreferenceStoreTest, ChecksEveryFileOfBothDirectories) {
+  write(configured(), "fine = 1\n");
+  write(directory_.path("configuration/com.orvane.one.toml"), "\noops\n");
+  write(directory_.path("state/com.orvane.two.toml"), "= 5\n");
+  write(directory_.path("state/com.orvane.three.toml.new"), "no preference file\n");
+  write(directory_.path("state/.lock"), "nor this\n");
+  store_.checkAllFiles();
+  store_.checkAllFiles();
+  EXPECT_THAT(log_.textsOf("twrs", LogLevel::kError),
+              testing::UnorderedElementsAre(HasSubstr("configuration/com.orvane.one.toml:2:"),
+                                            HasSubstr("state/com.orvane.two.toml:1:")));
+}
+
+TEST_F(TomlPreferenceStoreTest, ChecksNothingWhereThereAreNoDirectories) {
+  store_.checkAllFiles();
+  store_.checkFile("com.orvane.test.toml");
+  EXPECT_THAT(log_.lines(), testing::IsEmpty());
+}
+
 }  // namespace
 }  // namespace tonewerk
