@@ -1,7 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/ServerSocket.h"
 
+#include <algorithm>
 #include <cerrno>
+#include <cstddef>
+#include <cstring>
 #include <fcntl.h>
 #include <filesystem>
 #include <optional>
@@ -62,6 +65,15 @@ std::optional<std::string> listenerAt(const sockaddr_un& address) {
   return errno == EAGAIN ? std::optional<std::string>("another process") : std::nullopt;
 }
 
+// Where a bound socket's file is; empty for one without.
+std::string pathOf(int descriptor) {
+  sockaddr_un address{};
+  socklen_t size = sizeof(address);
+  if (::getsockname(descriptor, reinterpret_cast<sockaddr*>(&address), &size) != 0) return {};
+  const std::size_t length = size - std::min<std::size_t>(size, offsetof(sockaddr_un, sun_path));
+  return {address.sun_path, ::strnlen(address.sun_path, length)};
+}
+
 // Makes way for a new socket at `path`. False when it cannot be done.
 bool clear(const std::string& path, const sockaddr_un& address, std::string& problem) {
   struct stat there {};
@@ -94,6 +106,8 @@ std::unique_ptr<ServerSocket> ServerSocket::fromSystemd() {
     ::fcntl(descriptor, F_SETFL, ::fcntl(descriptor, F_GETFL) | O_NONBLOCK);
     auto socket = std::unique_ptr<ServerSocket>(new ServerSocket(FileDescriptor(descriptor)));
     socket->name_ = "the socket that systemd passed";
+    socket->isSystemds_ = true;
+    socket->noteFile(pathOf(descriptor));
     return socket;
   }
   return nullptr;
@@ -117,27 +131,47 @@ std::unique_ptr<ServerSocket> ServerSocket::bound(const std::string& path, std::
   auto socket = std::unique_ptr<ServerSocket>(new ServerSocket(newSocket()));
   const int descriptor = socket->fileDescriptor();
   // Nobody can connect before listen(), so the mode is right from the start.
-  struct stat made {};
   if (::bind(descriptor, generic(*address), sizeof(*address)) != 0 ||
-      ::chmod(path.c_str(), kSocketMode) != 0 || ::lstat(path.c_str(), &made) != 0 ||
-      ::listen(descriptor, SOMAXCONN) != 0) {
+      ::chmod(path.c_str(), kSocketMode) != 0 || ::listen(descriptor, SOMAXCONN) != 0) {
     problem = "cannot listen at " + path + ": " + textOfErrno(errno);
     return nullptr;
   }
   socket->name_ = path;
-  socket->path_ = path;
-  socket->device_ = made.st_dev;
-  socket->inode_ = made.st_ino;
+  socket->noteFile(path);
   return socket;
 }
 
-ServerSocket::~ServerSocket() {
-  if (path_.empty()) return;
-  const DirectoryLock lock(path_);
+void ServerSocket::noteFile(const std::string& path) {
+  struct stat made {};
+  if (path.empty() || ::lstat(path.c_str(), &made) != 0) return;
+  path_ = path;
+  device_ = made.st_dev;
+  inode_ = made.st_ino;
+}
+
+bool ServerSocket::isInPlace() const {
+  if (path_.empty()) return true;
   struct stat there {};
-  const bool isOurs =
-      ::lstat(path_.c_str(), &there) == 0 && there.st_dev == device_ && there.st_ino == inode_;
-  if (isOurs) ::unlink(path_.c_str());
+  return ::lstat(path_.c_str(), &there) == 0 && there.st_dev == device_ && there.st_ino == inode_;
+}
+
+std::unique_ptr<ServerSocket> ServerSocket::madeAgain(std::string& problem) const {
+  if (isSystemds_) {
+    problem = path_ + " was made by systemd, which has to make it again: restart twreportingd.socket";
+    return nullptr;
+  }
+  std::error_code error;
+  if (!std::filesystem::is_directory(directoryOf(path_), error)) {
+    problem = path_ + " went with its directory, and comes back with it";
+    return nullptr;
+  }
+  return bound(path_, problem);
+}
+
+ServerSocket::~ServerSocket() {
+  if (path_.empty() || isSystemds_) return;
+  const DirectoryLock lock(path_);
+  if (isInPlace()) ::unlink(path_.c_str());
 }
 
 }  // namespace tonewerk

@@ -22,6 +22,12 @@ class ServerSocket {
   // Closes the socket, and removes its file unless that is systemd's or by now somebody else's.
   ~ServerSocket();
 
+  // Whether clients still find it where it was made: its file may have gone, with its directory or without.
+  bool isInPlace() const;
+  // A new one in the place of one that went. Its directory must be there again. None, with `problem` saying
+  // why, also for a socket that systemd passed, which only systemd can make again.
+  std::unique_ptr<ServerSocket> madeAgain(std::string& problem) const;
+
   // Non-blocking.
   int fileDescriptor() const { return descriptor_.get(); }
   // For log lines.
@@ -32,10 +38,13 @@ class ServerSocket {
 
   static std::unique_ptr<ServerSocket> fromSystemd();
   static std::unique_ptr<ServerSocket> bound(const std::string& path, std::string& problem);
+  // Notes what the socket's file is now.
+  void noteFile(const std::string& path);
 
   FileDescriptor descriptor_;
   std::string name_;
-  // The file that we made; no path when it is not ours.
+  bool isSystemds_ = false;
+  // The socket's file; no path when it has none.
   std::string path_;
   dev_t device_ = 0;
   ino_t inode_ = 0;

@@ -86,6 +86,28 @@ void UnixSocketListener::handleWakes() {
     found->second->handleWake();
     removeIfEnded(identifier);
   }
+  if (mustRestore_.exchange(false)) makeSocketAgain();
+}
+
+void UnixSocketListener::restoreSocket() {
+  mustRestore_ = true;
+  waker_->wake(kWaker);
+}
+
+void UnixSocketListener::makeSocketAgain() {
+  if (socket_->isInPlace()) return;
+  std::string problem;
+  std::unique_ptr<ServerSocket> socket = socket_->madeAgain(problem);
+  if (socket == nullptr) {
+    errorLog(log_, "clients cannot connect: %@", problem);
+    return;
+  }
+  accept();  // who found the old one
+  const bool isPaused = acceptAgainAt_.has_value();
+  if (!isPaused) epoll_.remove(socket_->fileDescriptor());
+  socket_ = std::move(socket);
+  if (!isPaused) epoll_.add(socket_->fileDescriptor(), kSocket, EPOLLIN);
+  defaultLog(log_, "%@ was gone and is made again", socket_->name());
 }
 
 void UnixSocketListener::accept() {

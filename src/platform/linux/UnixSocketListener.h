@@ -46,6 +46,10 @@ class UnixSocketListener final : public MessagingListener {
   void resume() override;
   void shutDown() override;
 
+  // Any thread. Where the socket's file is gone, a new one is soon made in its place; connections live on.
+  // What stands in the way is logged.
+  void restoreSocket();
+
  private:
   // Numbers in the epoll; connections have those above.
   static constexpr std::uint64_t kSocket = 0;
@@ -55,6 +59,7 @@ class UnixSocketListener final : public MessagingListener {
   void handle(const Epoll::Event& event);
   void handleWakes();
   void accept();
+  void makeSocketAgain();
   void add(FileDescriptor socket);
   void pauseAccepting(const std::string& why);
   void resumeAccepting();
@@ -82,6 +87,7 @@ class UnixSocketListener final : public MessagingListener {
 
   std::mutex lifeMutex_;  // of resume() and shutDown()
   std::atomic<bool> isStopping_ = false;
+  std::atomic<bool> mustRestore_ = false;
   std::thread thread_;
 };
 

@@ -113,6 +113,39 @@ TEST_F(ServerSocketTest, SaysWhyItCannotListen) {
   EXPECT_THAT(problem, HasSubstr("cannot make"));
 }
 
+TEST_F(ServerSocketTest, IsMadeAgainInADirectoryThatIsMadeAgain) {
+  const std::string run = directory.path("run");
+  const std::string inRun = run + "/reporting.sock";
+  const auto socket = ServerSocket::open(inRun, problem);
+  ASSERT_NE(socket, nullptr) << problem;
+  EXPECT_TRUE(socket->isInPlace());
+
+  std::filesystem::remove_all(run);
+  EXPECT_FALSE(socket->isInPlace());
+  EXPECT_EQ(socket->madeAgain(problem), nullptr);
+  EXPECT_EQ(problem, inRun + " went with its directory, and comes back with it");
+  EXPECT_FALSE(std::filesystem::exists(run));
+
+  std::filesystem::create_directory(run);
+  const auto again = socket->madeAgain(problem);
+  ASSERT_NE(again, nullptr) << problem;
+  EXPECT_TRUE(again->isInPlace());
+  EXPECT_FALSE(socket->isInPlace());
+  EXPECT_TRUE(RawClient(inRun).isConnected());
+}
+
+TEST_F(ServerSocketTest, IsNotMadeAgainWhereAnotherProcessListensByNow) {
+  const auto socket = open();
+  ASSERT_NE(socket, nullptr);
+  std::filesystem::remove(path);
+  const auto others = open();
+  ASSERT_NE(others, nullptr);
+  EXPECT_FALSE(socket->isInPlace());
+  EXPECT_EQ(socket->madeAgain(problem), nullptr);
+  EXPECT_THAT(problem, HasSubstr("is in use by"));
+  EXPECT_TRUE(others->isInPlace());
+}
+
 // Runs in a child, whose descriptors are then systemd's to arrange: 0 when all was as it should be.
 int takesThePassedSocket(int listening, const std::string& path, const std::string& ownPath) {
   if (::dup2(listening, 3) != 3) return 10;
@@ -125,6 +158,12 @@ int takesThePassedSocket(int listening, const std::string& path, const std::stri
   if ((::fcntl(3, F_GETFL) & O_NONBLOCK) == 0 || (::fcntl(3, F_GETFD) & FD_CLOEXEC) == 0) return 13;
   if (!RawClient(path).isConnected()) return 14;
   if (std::getenv("LISTEN_FDS") != nullptr) return 15;
+  if (!socket->isInPlace()) return 17;
+  std::filesystem::rename(path, path + ".away");
+  const bool isMissed = !socket->isInPlace() && socket->madeAgain(problem) == nullptr &&
+                        problem.find("restart twreportingd.socket") != std::string::npos;
+  if (!isMissed || std::filesystem::exists(path)) return 18;
+  std::filesystem::rename(path + ".away", path);
   socket = nullptr;
   return std::filesystem::exists(path) ? 0 : 16;
 }
