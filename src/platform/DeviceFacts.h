@@ -6,7 +6,7 @@
 
 namespace tonewerk {
 
-// Properties of the device that do not change while it runs, such as "InternalBuild". Any thread.
+// Properties of the device, such as "InternalBuild"; they change at most by a reload. Any thread.
 class DeviceFacts {
  public:
   virtual ~DeviceFacts() = default;

@@ -4,6 +4,9 @@
 
 #include <chrono>
 #include <csignal>
+#include <cstddef>
+#include <filesystem>
+#include <initializer_list>
 #include <iostream>
 #include <memory>
 #include <mutex>
@@ -21,6 +24,7 @@
 #include "platform/linux/DbusListener.h"
 #include "platform/linux/DiagnosticsStore.h"
 #include "platform/linux/Directories.h"
+#include "platform/linux/DirectoryWatcher.h"
 #include "platform/linux/LinuxCapsa.h"
 #include "platform/linux/LinuxLinkReport.h"
 #include "platform/linux/LinuxPlatform.h"
@@ -34,6 +38,7 @@
 #include "platform/linux/TracingSetup.h"
 #include "platform/linux/UnixSocketListener.h"
 #include "platform/linux/WatchdogFeeder.h"
+#include "service/TWReportingClientServerInstance.h"
 #include "service/TWReportingService.h"
 #include "service/TWReportingServiceExport.h"
 #include "session/TWReportingContext.h"
@@ -59,7 +64,9 @@ constexpr std::string_view kHelp =
     "Usage: twreportingd [--help | --version]\n"
     "\n"
     "The reporting daemon: takes what audio processes report on a Unix socket and turns it into reports.\n"
-    "It ends in order on SIGTERM and SIGINT, at once on a second one.\n"
+    "It ends in order on SIGTERM and SIGINT, at once on a second one. SIGHUP has preferences and device "
+    "facts\n"
+    "read again, SIGUSR1 a line of status logged.\n"
     "\n"
     "Variables: RUNTIME_DIRECTORY, STATE_DIRECTORY, LOGS_DIRECTORY and CONFIGURATION_DIRECTORY say where "
     "things\n"
@@ -84,6 +91,10 @@ class Daemon {
   Daemon(const Directories& directories, std::unique_ptr<ServerSocket> socket, LinuxPlatform& linux,
          const ServiceManager& manager, const LogCategory& log)
       : manager_(manager),
+        status_("Listening on " + socket->name()),
+        linux_(linux),
+        runtimeDirectory_(directories.runtime),
+        log_(log),
         store_(directories.state, linux.json(), linux.preferences(), linux.clock(), log),
         metricon_(store_, linux.preferences(), linux.clock(), log),
         energybook_(store_, linux.clock()),
@@ -100,19 +111,43 @@ class Daemon {
         dbusListener_(dbusNames(), TWReportingServiceExport::exportedInterface(),
                       dbusAddressFromEnvironment(), log) {
     diagnostics_.removeLeftovers();  // the socket is ours, so no other daemon writes there
-    const bool traces = isTracingBuiltIn() && context_.isInternalBuild();
-    if (const std::error_code error = setSignpostMark(directories.runtime, traces)) {
-      errorLog(log, "cannot tell programs about signposts: %@", error.message());
-    }
+    // Asked for now, so that device facts that are read again later change nothing about it.
+    hasSignposts_ = context_.isInternalBuild() && isTracingBuiltIn();
     listener_.setDelegate(*service_);
     listener_.resume();
     dbusListener_.setDelegate(*service_);
     dbusListener_.resume();
+    runtimeWatcher_ = std::make_unique<DirectoryWatcher>(
+        runtimeDirectory_, [](std::string_view) {}, [this] { restoreRuntimeDirectory(); }, log_);
+    restoreRuntimeDirectory();  // it may have gone before it was watched
+    manager_.tellReady(status_);
+  }
+
+  // What is kept of preferences and device facts, and where clients connect, is looked at again.
+  void reload() {
+    manager_.tellReloading();
+    linux_.readConfigurationAgain();
+    metricon_.readConsumersAgain();
+    store_.readBoundsAgain();
+    restoreRuntimeDirectory();
+    defaultLog(log_, "preferences and device facts are read again");
+    manager_.tellReady(status_);
+  }
+
+  // One line in the log.
+  void sayStatus() {
+    context_.reportingServerQueue().async([this] {
+      std::size_t sessions = 0;
+      for (const auto& client : service_->getAllClients())
+        sessions += client->clientReportingSessionMap().size();
+      defaultLog(log_, "status: clients %zu, their sessions %zu", service_->getAllClients().size(), sessions);
+    });
   }
 
   // Every client is treated as lost, so that its started sessions stop and report.
   void endInOrder() {
     manager_.tellStopping("Finishing sessions and reports");
+    runtimeWatcher_ = nullptr;
     listener_.shutDown();
     dbusListener_.shutDown();
     SerialQueue& queue = context_.reportingServerQueue();
@@ -125,6 +160,21 @@ class Daemon {
   }
 
  private:
+  void markSignposts() {
+    if (const std::error_code error = setSignpostMark(runtimeDirectory_, hasSignposts_)) {
+      errorLog(log_, "cannot tell programs about signposts: %@", error.message());
+    }
+  }
+
+  // The directory may have been removed, and made again by somebody who knows nothing of what was in it.
+  void restoreRuntimeDirectory() {
+    listener_.restoreSocket();
+    std::error_code error;
+    if (!std::filesystem::is_directory(runtimeDirectory_, error)) return;
+    linux_.restoreRuntimeDirectory();
+    markSignposts();
+  }
+
   Platform platformOf(LinuxPlatform& linux, const Directories& directories) {
     Platform platform = linux.platform(metricon_, energybook_, diagwire_, linkReport_, tracing_);
     platform.logsDirectory = directories.logs;
@@ -149,6 +199,11 @@ class Daemon {
   }
 
   const ServiceManager& manager_;
+  const std::string status_;  // for the service manager
+  LinuxPlatform& linux_;
+  const std::string runtimeDirectory_;
+  const LogCategory& log_;
+  bool hasSignposts_ = false;
   ReportStore store_;
   StoreMetricon metricon_;
   StoreEnergybook energybook_;
@@ -161,26 +216,35 @@ class Daemon {
   std::shared_ptr<TWReportingService> service_;
   UnixSocketListener listener_;
   DbusListener dbusListener_;
-  std::mutex killMutex_;  // two front ends may get the request at once
+  std::mutex killMutex_;                              // two front ends may get the request at once
+  std::unique_ptr<DirectoryWatcher> runtimeWatcher_;  // last: it calls us
 };
 
-// Signals that end the daemon; blocked in every thread, so that main() alone takes them.
-sigset_t endSignals() {
+sigset_t signalSet(std::initializer_list<int> numbers) {
   sigset_t signals;
   sigemptyset(&signals);
-  sigaddset(&signals, SIGTERM);
-  sigaddset(&signals, SIGINT);
+  for (const int number : numbers) sigaddset(&signals, number);
   return signals;
 }
 
-void waitForEndSignal(const sigset_t& signals) {
-  int signal = 0;
-  while (sigwait(&signals, &signal) != 0) {
+// Blocked in every thread, so that main() alone takes them.
+sigset_t takenSignals() { return signalSet({SIGTERM, SIGINT, SIGHUP, SIGUSR1}); }
+
+// Does what signals ask for, until one of them asks for the end.
+void serveUntilEndSignal(Daemon& daemon) {
+  const sigset_t signals = takenSignals();
+  for (;;) {
+    int signal = 0;
+    if (sigwait(&signals, &signal) != 0) continue;
+    if (signal == SIGTERM || signal == SIGINT) break;
+    if (signal == SIGHUP) daemon.reload();
+    if (signal == SIGUSR1) daemon.sayStatus();
   }
   // A second one finds its default action and ends the process at once.
   std::signal(SIGTERM, SIG_DFL);
   std::signal(SIGINT, SIG_DFL);
-  pthread_sigmask(SIG_UNBLOCK, &signals, nullptr);
+  const sigset_t ends = signalSet({SIGTERM, SIGINT});
+  pthread_sigmask(SIG_UNBLOCK, &ends, nullptr);
 }
 
 // Each client takes a descriptor; the usual soft limit is far below what the system allows.
@@ -192,7 +256,7 @@ void raiseDescriptorLimit() {
 }
 
 int run() {
-  const sigset_t signals = endSignals();
+  const sigset_t signals = takenSignals();
   pthread_sigmask(SIG_BLOCK, &signals, nullptr);
   std::signal(SIGPIPE, SIG_IGN);
   std::signal(SIGXFSZ, SIG_IGN);  // a file that may not grow is a write that fails
@@ -207,12 +271,10 @@ int run() {
     errorLog(log, "cannot listen: %@", problem);
     return kFailure;
   }
-  const std::string status = "Listening on " + socket->name();
   defaultLog(log, "listening on %@, state in %@", socket->name(), directories.state);
   const ServiceManager manager{};
   Daemon daemon(directories, std::move(socket), linux, manager, log);
-  manager.tellReady(status);
-  waitForEndSignal(signals);
+  serveUntilEndSignal(daemon);
   daemon.endInOrder();
   return kSuccess;
 }

@@ -1,16 +1,19 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/InotifyNotificationService.h"
 
-#include <filesystem>
 #include <system_error>
 #include <utility>
+
+#include "platform/linux/LinuxFileSystem.h"
 
 namespace tonewerk {
 namespace {
 
+constexpr unsigned kDirectoryMode = 0755;
+
 const std::string& made(const std::string& directory) {
-  std::error_code error;  // the watcher says what is wrong with it, and waits for it
-  std::filesystem::create_directories(directory, error);
+  // The watcher says what is wrong with it, and waits for it.
+  static_cast<void>(LinuxFileSystem().createDirectories(directory, kDirectoryMode));
   return directory;
 }
 
@@ -38,6 +41,8 @@ std::optional<std::uint64_t> InotifyNotificationService::state(Token token) cons
 }
 
 void InotifyNotificationService::cancel(Token token) { handlers_.remove(token); }
+
+void InotifyNotificationService::makeDirectory() { made(files_.directory()); }
 
 std::error_code InotifyNotificationService::post(std::string_view name) { return files_.post(name); }
 

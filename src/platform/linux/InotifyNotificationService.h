@@ -31,6 +31,11 @@ class InotifyNotificationService final : public NotificationService {
   void cancel(Token token) override;
   std::error_code post(std::string_view name) override;
 
+  // Makes the directory again, where it went with all around it.
+  void makeDirectory();
+  // Every registered handler is told.
+  void tellEverything() { handlers_.tellAll(); }
+
  private:
   const NotificationFiles files_;
   NotificationHandlers handlers_;

@@ -102,6 +102,14 @@ FileSystem& LinuxPlatform::files() { return adapters_->files; }
 LinuxCapsa& LinuxPlatform::capsa() { return adapters_->capsa; }
 DiagnosticsStore& LinuxPlatform::diagnostics() { return adapters_->diagnostics; }
 
+void LinuxPlatform::readConfigurationAgain() {
+  adapters_->deviceFacts.readAgain();
+  adapters_->preferences.checkAllFiles();
+  adapters_->notifications.tellEverything();  // what follows preferences looks at them then
+}
+
+void LinuxPlatform::restoreRuntimeDirectory() { adapters_->notifications.makeDirectory(); }
+
 Platform LinuxPlatform::platform(Metricon& metricon, Energybook& energybook, Diagwire& diagwire,
                                  LinkReport& linkReport, const Tracing& tracing) {
   Adapters& a = *adapters_;

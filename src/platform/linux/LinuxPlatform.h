@@ -34,6 +34,11 @@ class LinuxPlatform {
   LinuxCapsa& capsa();
   DiagnosticsStore& diagnostics();
 
+  // Preferences and device facts are looked at again now: who reads them next finds them as they are.
+  void readConfigurationAgain();
+  // The runtime directory was made anew: what the adapters had in it is there again.
+  void restoreRuntimeDirectory();
+
   // The services handed in outlive what uses the result.
   Platform platform(Metricon& metricon, Energybook& energybook, Diagwire& diagwire, LinkReport& linkReport,
                     const Tracing& tracing);

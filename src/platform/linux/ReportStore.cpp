@@ -49,6 +49,11 @@ void ReportStore::record(StoreRow row) {
   if (hangs) errorLog(log_, "writing to %s hangs; what does not fit is dropped", database_.path());
 }
 
+void ReportStore::readBoundsAgain() {
+  areBoundsStale_ = true;
+  queue_.nudge();
+}
+
 bool ReportStore::flush(std::chrono::milliseconds timeout) { return queue_.flush(timeout); }
 
 void ReportStore::run() {
@@ -124,8 +129,7 @@ void ReportStore::trim() {
 
 void ReportStore::readBounds() {
   const std::chrono::nanoseconds now = clock_.monotonic();
-  if (boundsRead_ && now - boundsReadAt_ < kBoundsInterval) return;
-  boundsRead_ = true;
+  if (!areBoundsStale_.exchange(false) && now - boundsReadAt_ < kBoundsInterval) return;
   boundsReadAt_ = now;
   ageDue_ = true;
   StoreBounds bounds;

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <atomic>
 #include <chrono>
 #include <cstdint>
 #include <string>
@@ -28,8 +29,8 @@ class PreferenceStore;
 // A damaged file is moved aside.
 //
 // The bounds are preferences of the domain "com.orvane.tonewerk.store": "max_megabytes" (256) and "max_days"
-// (30). They are read again every ten seconds while there is something to write, and what is too old is
-// deleted then.
+// (30). They are read again every ten seconds while there is something to write, and when somebody asks for
+// it; what is too old is deleted then.
 class ReportStore {
  public:
   static constexpr std::string_view kPreferenceDomain = "com.orvane.tonewerk.store";
@@ -52,6 +53,9 @@ class ReportStore {
   void recordEvent(double recordedAt, const SharedString& name, ValueMap payload);
   // Any thread. A row of any table.
   void record(StoreRow row);
+
+  // Any thread. The bounds are read again and kept to at once, also where there is nothing to write.
+  void readBoundsAgain();
 
   // Any thread but the work of JsonService, preferences and log. Returns when everything recorded before is
   // in the file; false when it cannot be written or `timeout` passed.
@@ -78,13 +82,13 @@ class ReportStore {
   const Clock& clock_;
   const LogCategory& log_;
   StoreQueue queue_;
+  std::atomic<bool> areBoundsStale_ = true;
 
   // The thread's own.
   StoreDatabase database_;
   std::vector<StoreRow> batch_;
   StoreBounds bounds_;
   std::chrono::nanoseconds boundsReadAt_{0};
-  bool boundsRead_ = false;
   bool ageDue_ = false;  // a look at the oldest rows is due
   bool moreToTrim_ = false;
   std::string loggedProblem_;  // empty while writing goes well

@@ -3,6 +3,8 @@
 
 #include <algorithm>
 #include <cstdint>
+#include <ctime>
+#include <string>
 #include <systemd/sd-daemon.h>
 
 namespace tonewerk {
@@ -17,6 +19,14 @@ void tell(const std::string& message) { ::sd_notify(kKeepVariables, message.c_st
 }  // namespace
 
 void ServiceManager::tellReady(const std::string& status) const { tell("READY=1\nSTATUS=" + status); }
+
+// The manager tells by the time which READY=1 belongs to this.
+void ServiceManager::tellReloading() const {
+  timespec now{};
+  ::clock_gettime(CLOCK_MONOTONIC, &now);
+  const std::int64_t microseconds = now.tv_sec * 1'000'000LL + now.tv_nsec / 1'000;
+  tell("RELOADING=1\nMONOTONIC_USEC=" + std::to_string(microseconds));
+}
 
 // A ping that is on its way when the manager ends us would start its watch anew, which nobody feeds any more.
 // A time-out of 0 ends that watch.

@@ -20,6 +20,9 @@ class ServiceManager {
   // Clients are served from now on. `status` is for people, in one line.
   void tellReady(const std::string& status) const;
 
+  // The configuration is being read again, until tellReady().
+  void tellReloading() const;
+
   // The end has begun, and takes as long as it takes: the manager expects no more pings.
   void tellStopping(const std::string& status) const;
 

@@ -17,6 +17,11 @@ StoreMetricon::StoreMetricon(ReportStore& store, const PreferenceStore& preferen
 
 StoreMetricon::~StoreMetricon() = default;
 
+void StoreMetricon::readConsumersAgain() {
+  const std::lock_guard lock(mutex_);
+  isStale_ = true;
+}
+
 bool StoreMetricon::isEventUsed(std::string_view name) {
   const std::lock_guard lock(mutex_);
   readConsumers();
@@ -36,7 +41,7 @@ void StoreMetricon::sendEvent(const SharedString& name, const UniqueFunction<Val
 
 void StoreMetricon::readConsumers() {
   const std::chrono::nanoseconds now = clock_.monotonic();
-  if (consumers_ && now - readAt_ < kReadInterval) return;
+  if (!std::exchange(isStale_, false) && now - readAt_ < kReadInterval) return;
   readAt_ = now;
   std::optional<Value> preference = preferences_.read(kPreferenceDomain, kConsumersKey);
   if (consumers_ && preference == preference_) return;

@@ -33,6 +33,9 @@ class StoreMetricon final : public Metricon {
                 const LogCategory& log);
   ~StoreMetricon() override;
 
+  // Any thread. The next event finds the preference as it is then.
+  void readConsumersAgain();
+
   bool isEventUsed(std::string_view name) override;
   // Records nothing when nobody asks for the name.
   void sendEvent(const SharedString& name, const UniqueFunction<ValueMap()>& payload) override;
@@ -59,6 +62,7 @@ class StoreMetricon final : public Metricon {
   std::optional<AnalyticsConsumers> consumers_;
   std::optional<Value> preference_;  // what consumers_ was made of
   std::chrono::nanoseconds readAt_{0};
+  bool isStale_ = true;
   std::unordered_map<std::string, bool, NameHash, std::equal_to<>> remembered_;
 };
 

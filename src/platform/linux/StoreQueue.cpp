@@ -57,9 +57,10 @@ bool StoreQueue::take(std::vector<StoreRow>& batch, bool wait) {
   batch.clear();
   std::unique_lock lock(mutex_);
   if (wait) {
-    work_.wait(lock, [&] { return !queued_.empty() || stopped_; });
+    work_.wait(lock, [&] { return !queued_.empty() || stopped_ || nudged_; });
     work_.wait_for(lock, limits_.gather, [&] { return isUrgent(); });
   }
+  nudged_ = false;
   takenBytes_ = 0;
   while (!queued_.empty() && batch.size() < limits_.batchRows && takenBytes_ < limits_.batchBytes) {
     takenBytes_ += bytesOf(queued_.front());
@@ -70,6 +71,12 @@ bool StoreQueue::take(std::vector<StoreRow>& batch, bool wait) {
   queuedBytes_ -= takenBytes_;
   leftOver_ = !queued_.empty();
   return !batch.empty() || !stopped_;
+}
+
+void StoreQueue::nudge() {
+  const std::lock_guard lock(mutex_);
+  nudged_ = true;
+  work_.notify_all();
 }
 
 void StoreQueue::attempt() {
@@ -127,7 +134,7 @@ bool StoreQueue::fits(std::size_t bytes) const {
 }
 
 bool StoreQueue::isUrgent() const {
-  return stopped_ || leftOver_ || openFlushes_ > 0 || queued_.size() >= limits_.batchRows ||
+  return stopped_ || nudged_ || leftOver_ || openFlushes_ > 0 || queued_.size() >= limits_.batchRows ||
          queuedBytes_ >= limits_.bytes / 4;
 }
 

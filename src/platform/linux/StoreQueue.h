@@ -48,6 +48,9 @@ class StoreQueue {
   // began after the call fails, or after `timeout`.
   bool flush(std::chrono::milliseconds timeout);
 
+  // Any thread. The next take() does not wait for rows, or one that waits comes back, perhaps with none.
+  void nudge();
+
   // Ends take() and pause(), once the queue is empty or writing fails.
   void stop();
 
@@ -89,6 +92,7 @@ class StoreQueue {
   std::size_t takenBytes_ = 0;
   bool holds_ = true;  // whether add() waits for room
   bool stopped_ = false;
+  bool nudged_ = false;
   std::uint64_t added_ = 0;
   std::uint64_t committed_ = 0;
   std::uint64_t dropped_ = 0;

@@ -102,7 +102,7 @@ void UnixSocketListener::makeSocketAgain() {
     errorLog(log_, "clients cannot connect: %@", problem);
     return;
   }
-  accept();  // who found the old one
+  if (!acceptAgainAt_) accept();  // who found the old one
   const bool isPaused = acceptAgainAt_.has_value();
   if (!isPaused) epoll_.remove(socket_->fileDescriptor());
   socket_ = std::move(socket);

@@ -17,7 +17,7 @@ using testing::IsEmpty;
 
 class TomlDeviceFactsTest : public testing::Test {
  protected:
-  std::unique_ptr<DeviceFacts> factsOf(const std::string& text) {
+  std::unique_ptr<TomlDeviceFacts> factsOf(const std::string& text) {
     std::ofstream(directory_.path("device-facts.toml")) << text;
     return std::make_unique<TomlDeviceFacts>(directory_.path("device-facts.toml"), category_);
   }
@@ -61,10 +61,20 @@ TEST_F(TomlDeviceFactsTest, AFileThatDoesNotParseStatesNothingAndIsLogged) {
   EXPECT_THAT(log_.textsOf("twrs"), ElementsAre(HasSubstr("device-facts.toml:2:")));
 }
 
-TEST_F(TomlDeviceFactsTest, FactsDoNotChangeWhileTheProcessRuns) {
+TEST_F(TomlDeviceFactsTest, FactsChangeWhenTheyAreReadAgainAndNotBefore) {
   const auto facts = factsOf("InternalBuild = true\n");
   factsOf("InternalBuild = false\n");
   EXPECT_EQ(facts->boolean("InternalBuild"), true);
+  facts->readAgain();
+  EXPECT_EQ(facts->boolean("InternalBuild"), false);
+}
+
+TEST_F(TomlDeviceFactsTest, AFileThatIsBrokenWhenItIsReadAgainStatesNothingAndIsLogged) {
+  const auto facts = factsOf("InternalBuild = true\n");
+  std::ofstream(directory_.path("device-facts.toml")) << "oops\n";
+  facts->readAgain();
+  EXPECT_EQ(facts->boolean("InternalBuild"), std::nullopt);
+  EXPECT_THAT(log_.textsOf("twrs", LogLevel::kError), ElementsAre(HasSubstr("device-facts.toml:1:")));
 }
 
 }  // namespace

@@ -682,6 +682,24 @@ TEST_F(BoundedReportStoreTest, ANewestRowThatTheBoundHasNoRoomForIsEmptiedAndCos
   EXPECT_EQ(number("SELECT count(*) FROM power_event WHERE payload = '{}'"), 1);
 }
 
+TEST_F(BoundedReportStoreTest, KeepsToANewBoundAtOnceWhenItIsToldToReadItAgain) {
+  openBoundedTo(8);
+  for (int n = 0; n < 3000; ++n) recordRow(n, 1000);
+  ASSERT_TRUE(flush());
+  preferences_.configure("com.orvane.tonewerk.store", "max_megabytes", 1);
+  bounds_.bytes = 1 << 20;
+  recordRow(3000, 1000);
+  ASSERT_TRUE(flush());
+  EXPECT_GT(usedPart(), 3.0);  // the clock has not come to the next look
+
+  store_->readBoundsAgain();
+  recordRow(3001, 1000);
+  ASSERT_TRUE(flush());
+  close();  // with what trimming was begun
+  EXPECT_LE(usedPart(), 1.0);
+  expectTheNewestOf(3002);
+}
+
 TEST_F(BoundedReportStoreTest, WhatStaysIsBetweenNineTenthsOfTheBoundAndAllOfItWhateverTheRows) {
   for (unsigned seed = 1; seed <= 8; ++seed) {
     SCOPED_TRACE(seed);

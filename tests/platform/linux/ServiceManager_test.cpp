@@ -2,9 +2,11 @@
 #include "platform/linux/ServiceManager.h"
 
 #include <cstdlib>
+#include <ctime>
 #include <gmock/gmock.h>
 #include <string>
 #include <unistd.h>
+#include <vector>
 
 #include "support/NotifySocket.h"
 
@@ -93,6 +95,21 @@ TEST_F(ServiceManagerTest, ThePingsIntervalIsBounded) {
   EXPECT_EQ(manager.pingInterval(), 1ms);
   set("WATCHDOG_USEC", "18446744073709551613");
   EXPECT_EQ(manager.pingInterval(), 1h);
+}
+
+TEST_F(ServiceManagerTest, IsToldThatTheConfigurationIsReadAgainAndSinceWhen) {
+  set("NOTIFY_SOCKET", socket.path());
+  timespec before{};
+  ASSERT_EQ(clock_gettime(CLOCK_MONOTONIC, &before), 0);
+  manager.tellReloading();
+  manager.tellReady("Listening");
+  const std::vector<std::string> told = socket.take();
+  ASSERT_EQ(told.size(), 2U);
+  const std::string kLine = "RELOADING=1\nMONOTONIC_USEC=";
+  ASSERT_EQ(told[0].substr(0, kLine.size()), kLine);
+  EXPECT_GE(std::stoll(told[0].substr(kLine.size())), before.tv_sec * 1'000'000LL);
+  EXPECT_LT(std::stoll(told[0].substr(kLine.size())), (before.tv_sec + 60) * 1'000'000LL);
+  EXPECT_EQ(told[1], "READY=1\nSTATUS=Listening");
 }
 
 }  // namespace

@@ -80,6 +80,13 @@ TEST_F(StoreMetriconTest, SeesAChangeWithinASecond) {
   EXPECT_FALSE(metricon_.isEventUsed("com.orvane.tonewerk.IO.Stop"));
 }
 
+TEST_F(StoreMetriconTest, SeesAChangeAtOnceWhenItIsToldToReadAgain) {
+  EXPECT_FALSE(metricon_.isEventUsed("org.example.x"));
+  preferences_.configure("com.orvane.metricon", "consumers", ValueArray{consumer("c", {"org.*"})});
+  metricon_.readConsumersAgain();
+  EXPECT_TRUE(metricon_.isEventUsed("org.example.x"));
+}
+
 TEST_F(StoreMetriconTest, SaysOnceWhatItCannotRead) {
   configureConsumers(ValueArray{5, consumer("good", {"org.*", 7}), ValueMap{{"name", "empty"}},
                                 ValueMap{{"events", ValueArray{"net.*"}}}});

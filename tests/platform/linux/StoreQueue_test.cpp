@@ -130,5 +130,17 @@ TEST_F(StoreQueueTest, GivesWhatIsLeftBeforeItStops) {
   EXPECT_FALSE(queue_.pause(kLongEnough));
 }
 
+TEST_F(StoreQueueTest, ANudgedWriterComesBackWithoutRows) {
+  queue_.nudge();
+  ASSERT_TRUE(queue_.take(batch_, true));
+  EXPECT_THAT(batch_, IsEmpty());
+  queue_.committed();
+
+  auto writer = std::async(std::launch::async, [this] { return queue_.take(batch_, true); });
+  queue_.nudge();
+  EXPECT_TRUE(writer.get());
+  EXPECT_THAT(batch_, IsEmpty());
+}
+
 }  // namespace
 }  // namespace tonewerk
