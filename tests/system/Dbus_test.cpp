@@ -11,6 +11,7 @@
 
 #include "platform/linux/DbusCaller.h"
 #include "platform/linux/DbusValues.h"
+#include "platform/linux/ForeignDbusCaller.h"
 #include "platform/linux/PrivateBus.h"
 #include "support/TemporaryDirectory.h"
 #include "system/support/DaemonTest.h"
@@ -73,6 +74,62 @@ TEST_F(DbusTest, EveryRequestIsAnswered) {
   EXPECT_TRUE(caller.ask("StopReportingSessionForID", "x", kSession).boolean());
   EXPECT_TRUE(caller.ask("DestroyReportingSession", "x", kSession).boolean());
   EXPECT_THAT(caller.ask("GetAllReporters").int64List(), IsEmpty());
+}
+
+TEST_F(DbusTest, EveryRequestMayComeInTheOtherByteOrder) {
+  ForeignDbusCaller caller(bus.address(), kNames);
+  const auto body = [] { return ForeignDbusCaller::body(); };
+  const auto ofSession = [&](const char* member) {
+    return caller.ask(member, "x", body().number64(kSession));
+  };
+  const auto done = [](const ForeignDbusCaller::Answer& answer) {
+    return answer.error.empty() ? answer.number<std::uint32_t>() == 1
+                                : (ADD_FAILURE() << answer.text(), false);
+  };
+  EXPECT_TRUE(done(ofSession("CreateReportingSession")));
+  EXPECT_TRUE(done(caller.ask("SetServiceType", "qx", body().number16(kLongFormAudio).number64(kSession))));
+  const auto name = [](DbusBytes& map) { map.entry("HostApplicationDisplayID", "s").string("player"); };
+  EXPECT_TRUE(done(caller.ask("SetConfiguration", "a{sv}x", body().array(8, name).number64(kSession))));
+  EXPECT_EQ(ofSession("GetServiceNameForReporterID").number<std::uint16_t>(), kLongFormAudio);
+  EXPECT_EQ(ofSession("ReporterIDValid").signature, "a{sv}");
+  EXPECT_EQ(caller.ask("GetAllReporters").body.size(), 16U);  // a length, padded, and an identifier
+  caller.send("StartReportingSessionForID", "x", body().number64(kSession));
+
+  const auto content = [](int place) {
+    return [place](DbusBytes& map) {
+      map.entry("place", "i").number32(static_cast<std::uint32_t>(place));
+      map.entry("levels", "ad").array(8, [](DbusBytes& levels) { levels.real(0.5).real(-60); });
+      map.entry("route", "a{sa{sv}}").array(8, [](DbusBytes& route) {
+        route.align(8).string("port").array(8,
+                                            [](DbusBytes& port) { port.entry("number", "x").number64(2); });
+      });
+    };
+  };
+  const auto nobody = [](DbusBytes&) {};
+  const auto session = [](DbusBytes& identifiers) { identifiers.number64(kSession).number64(4711); };
+  for (int place = 0; place < 2; ++place) {
+    DbusBytes message = body();
+    message.array(8, content(place)).number32(5).number16(5);
+    place == 0 ? message.array(8, nobody) : message.array(8, session);
+    const ForeignDbusCaller::Answer sent = caller.ask("SendMessage", "a{sv}uqax", message);
+    EXPECT_EQ(sent.error, "") << sent.text();
+  }
+  EXPECT_TRUE(done(ofSession("StopReportingSessionForID")));
+  EXPECT_TRUE(done(ofSession("DestroyReportingSession")));
+
+  const RecordedEvents recorded(daemon.storePath());
+  const char* event = "com.orvane.tonewerk.Output.Setup";
+  ASSERT_TRUE(waitUntil([&] { return recorded.named(event).size() >= 2; }));
+  const std::vector<nlohmann::json> events = recorded.named(event);
+  ASSERT_THAT(events, SizeIs(2));
+  for (int place = 0; place < 2; ++place) {
+    EXPECT_EQ(events[place].at("place"), place);
+    EXPECT_EQ(events[place].at("levels"), nlohmann::json::array({0.5, -60.0}));
+    EXPECT_EQ(events[place].at("route").at("port").at("number"), 2);
+  }
+  const ForeignDbusCaller::Answer killed = caller.ask("KillService");
+  EXPECT_EQ(killed.error, "org.freedesktop.DBus.Error.NoReply");
+  EXPECT_EQ(daemon.process().wait(), 2);
 }
 
 TEST_F(DbusTest, AStartIsAnsweredAtTheStopBeforeTheStopItself) {

@@ -3,7 +3,6 @@
 
 #include <cmath>
 #include <cstdint>
-#include <cstring>
 #include <limits>
 #include <string>
 #include <string_view>
@@ -32,6 +31,30 @@ struct NextType {
     return {kind};
   }
 };
+
+// What is wrong with the type that `types` begins with, as it continues "argument 1 (message) ", if something
+// is; takes the type off the front. What a variant in it holds is another matter.
+const char* problemOfType(std::string_view& types) {
+  const char kind = types.empty() ? '\0' : types.front();
+  types.remove_prefix(types.empty() ? 0 : 1);
+  switch (kind) {
+    case SD_BUS_TYPE_ARRAY:
+      if (!types.starts_with('{')) return problemOfType(types);
+      if (!types.starts_with("{s")) return "has a key that is not text";
+      types.remove_prefix(2);
+      if (const char* problem = problemOfType(types)) return problem;
+      types.remove_prefix(types.empty() ? 0 : 1);  // the brace
+      return nullptr;
+    case SD_BUS_TYPE_STRUCT_BEGIN:
+      if (!types.starts_with("d)")) return "holds a struct other than a date";
+      types.remove_prefix(2);
+      return nullptr;
+    case SD_BUS_TYPE_UNIX_FD:
+      return "holds a file descriptor";
+    default:
+      return nullptr;
+  }
+}
 
 // Reads values up to the first thing that is wrong; then problem() says what it is, as it continues "argument
 // 1 (message) ", and everything read since is worthless.
@@ -109,6 +132,13 @@ class ValueReader {
     return found ? std::move(*found) : SharedString();
   }
 
+  // By its type and not only by what there is of it: there may be nothing.
+  bool isWelcome(std::string_view types) {
+    if (types.starts_with(SD_BUS_TYPE_VARIANT)) return fail("holds a variant in a variant");
+    const char* problem = problemOfType(types);
+    return problem == nullptr || fail(problem);
+  }
+
   bool enter(char kind, const std::string& contents) {
     return sd_bus_message_enter_container(message_, kind, contents.c_str()) > 0 || malformed();
   }
@@ -129,7 +159,8 @@ class ValueReader {
     NextType type;
     if (!next(type)) return {};
     if (type.kind != SD_BUS_TYPE_VARIANT) return plain(type, depth);
-    if (!count(kHeaderBytes) || !enter(SD_BUS_TYPE_VARIANT, type.contents)) return {};
+    if (!count(kHeaderBytes) || !isWelcome(type.contents) || !enter(SD_BUS_TYPE_VARIANT, type.contents))
+      return {};
     NextType content;
     if (!next(content)) return {};
     Value inner = plain(content, depth);
@@ -166,12 +197,6 @@ class ValueReader {
       case SD_BUS_TYPE_ARRAY:
         if (type.contents.starts_with('{')) return map(type.contents, depth);
         return array(type.contents, depth);
-      case SD_BUS_TYPE_UNIX_FD:
-        fail("holds a file descriptor");
-        return {};
-      case SD_BUS_TYPE_VARIANT:
-        fail("holds a variant in a variant");
-        return {};
       default:
         malformed();
         return {};
@@ -185,10 +210,6 @@ class ValueReader {
   }
 
   Value date(const std::string& contents) {
-    if (contents != "d") {
-      fail("holds a struct other than a date");
-      return {};
-    }
     if (!enter(SD_BUS_TYPE_STRUCT, contents)) return {};
     const auto seconds = basic<double>(SD_BUS_TYPE_DOUBLE);
     leave();
@@ -199,10 +220,6 @@ class ValueReader {
   // `contents` is the dictionary's entry type in braces.
   Value map(const std::string& contents, std::size_t depth) {
     ValueMap map;
-    if (contents.size() < 3 || contents[1] != SD_BUS_TYPE_STRING) {
-      fail("has a key that is not text");
-      return {};
-    }
     if (!isDeepEnough(depth) || !count(kHeaderBytes) || !enter(SD_BUS_TYPE_ARRAY, contents)) return {};
     const std::string entry = contents.substr(1, contents.size() - 2);
     while (hasMore() && enter(SD_BUS_TYPE_DICT_ENTRY, entry)) {
@@ -223,19 +240,13 @@ class ValueReader {
     return Value(ValueArray(std::move(values)));
   }
 
-  // None when it is empty: D-Bus has no nil.
+  // None when it is empty: D-Bus has no nil. The library reads arrays in one piece only where they are in
+  // this machine's byte order.
   Argument int64List() {
-    const void* data = nullptr;
-    std::size_t size = 0;
-    if (sd_bus_message_read_array(message_, SD_BUS_TYPE_INT64, &data, &size) < 0) malformed();
-    if (hasFailed() || !count(kHeaderBytes + size) || size == 0) return std::nullopt;
+    if (!count(kHeaderBytes) || !enter(SD_BUS_TYPE_ARRAY, "x")) return std::nullopt;
     std::vector<Value> values;
-    values.reserve(size / sizeof(std::int64_t));
-    for (std::size_t at = 0; at + sizeof(std::int64_t) <= size; at += sizeof(std::int64_t)) {
-      std::int64_t number = 0;
-      std::memcpy(&number, static_cast<const char*>(data) + at, sizeof(number));
-      values.emplace_back(number);
-    }
+    while (hasMore()) values.emplace_back(basic<std::int64_t>(SD_BUS_TYPE_INT64));
+    if (!leave() || values.empty()) return std::nullopt;
     return Value(ValueArray(std::move(values)));
   }
 

@@ -5,6 +5,7 @@
 #include "platform/linux/DbusArguments.h"
 
 #include <array>
+#include <bit>
 #include <cmath>
 #include <cstdint>
 #include <gtest/gtest.h>
@@ -16,6 +17,7 @@
 #include <systemd/sd-bus.h>
 #include <utility>
 
+#include "platform/linux/DbusBytes.h"
 #include "platform/linux/DbusInterface.h"
 #include "platform/linux/FileDescriptor.h"
 #include "platform/linux/MessagingRig.h"
@@ -26,76 +28,23 @@
 namespace tonewerk {
 namespace {
 
-// Bytes as messages have them, little-endian.
-class Bytes {
- public:
-  const std::string& text() const { return text_; }
-  std::size_t size() const { return text_.size(); }
-
-  Bytes& align(std::size_t to) {
-    while (text_.size() % to != 0) text_ += '\0';
-    return *this;
-  }
-  Bytes& byte(std::uint8_t value) {
-    text_ += static_cast<char>(value);
-    return *this;
-  }
-  Bytes& number(std::uint32_t value) { return align(4).raw(value); }
-  Bytes& real(double value) { return align(8).raw(value); }
-  Bytes& string(std::string_view text) {
-    number(static_cast<std::uint32_t>(text.size()));
-    text_ += text;
-    return byte(0);
-  }
-  Bytes& signature(std::string_view text) {
-    byte(static_cast<std::uint8_t>(text.size()));
-    text_ += text;
-    return byte(0);
-  }
-  // Puts the length of what has come since `begin` into the number before it.
-  void setLength(std::size_t at, std::size_t begin) {
-    const auto length = static_cast<std::uint32_t>(text_.size() - begin);
-    text_.replace(at, sizeof(length), reinterpret_cast<const char*>(&length), sizeof(length));
-  }
-
- private:
-  template <typename T>
-  Bytes& raw(T value) {
-    text_.append(reinterpret_cast<const char*>(&value), sizeof(value));
-    return *this;
-  }
-
-  std::string text_;
-};
-
-std::string messageOf(std::string_view signature, const std::string& body) {
-  Bytes message;
-  message.byte('l').byte(1).byte(1).byte(1);  // a call that expects no reply
-  message.number(static_cast<std::uint32_t>(body.size())).number(1).number(0);
-  const std::size_t begin = message.size();
-  message.byte(1).signature("o").string("/a");
-  message.align(8).byte(3).signature("s").string("Call");
-  message.align(8).byte(8).signature("g").signature(signature);
-  message.setLength(begin - 4, begin);
-  return message.align(8).text() + body;
+std::string messageOf(std::string_view signature, const std::string& body,
+                      std::endian order = std::endian::little) {
+  return dbusCallOf({"/a", "Call", "", ""}, signature, body, order, 1, false);
 }
 
 // A map of a text, a number, a date, an array and a map.
-std::string mapBody() {
-  Bytes body;
-  body.number(0).align(8);
-  const std::size_t begin = body.size();
-  body.string("text").signature("s").string("Gr\xC3\xBC\xC3\x9F");
-  body.align(8).string("number").signature("d").real(0.5);
-  body.align(8).string("date").signature("(d)").real(1763634000.5);
-  body.align(8).string("array").signature("ai").number(8).number(1).number(2);
-  body.align(8).string("map").signature("a{sv}").align(4);
-  const std::size_t length = body.size();
-  body.number(0).align(8);
-  const std::size_t inner = body.size();
-  body.string("inner").signature("as").number(13).string("a").string("");
-  body.setLength(length, inner);
-  body.setLength(0, begin);
+std::string mapBody(std::endian order = std::endian::little) {
+  DbusBytes body(order);
+  body.array(8, [](DbusBytes& map) {
+    map.entry("text", "s").string("Gr\xC3\xBC\xC3\x9F");
+    map.entry("number", "d").real(0.5);
+    map.entry("date", "(d)").real(1763634000.5);
+    map.entry("array", "ai").array(4, [](DbusBytes& array) { array.number32(1).number32(2); });
+    map.entry("map", "a{sv}").array(8, [](DbusBytes& inner) {
+      inner.entry("inner", "as").array(4, [](DbusBytes& array) { array.string("a").string(""); });
+    });
+  });
   return body.text();
 }
 
@@ -168,9 +117,11 @@ void expectSound(const Value& value, std::size_t depth) {
   }
 }
 
-TEST(DbusArgumentsTest, ReadsWhatTheTestWrites) {
+class DbusArgumentsOrderTest : public testing::TestWithParam<std::endian> {};
+
+TEST_P(DbusArgumentsOrderTest, ReadsWhatTheTestWrites) {
   ReadingEnd end;
-  const std::optional<DbusArguments> read = end.read(messageOf("a{sv}", mapBody()));
+  const std::optional<DbusArguments> read = end.read(messageOf("a{sv}", mapBody(GetParam()), GetParam()));
   ASSERT_TRUE(read);
   ASSERT_FALSE(read->problem) << read->problem->message;
   const ValueMap expected{{"text", "Gr\xC3\xBC\xC3\x9F"},
@@ -180,6 +131,11 @@ TEST(DbusArgumentsTest, ReadsWhatTheTestWrites) {
                           {"map", ValueMap{{"inner", ValueArray{"a", ""}}}}};
   EXPECT_EQ(*read->arguments.at(0)->asMap(), expected) << read->arguments.at(0)->text();
 }
+
+INSTANTIATE_TEST_SUITE_P(All, DbusArgumentsOrderTest, testing::Values(std::endian::little, std::endian::big),
+                         [](const auto& tested) {
+                           return tested.param == std::endian::native ? "ThisMachines" : "TheOther";
+                         });
 
 TEST(DbusArgumentsTest, RefusesABodyThatIsNotWhatItsSignatureSays) {
   std::string body = mapBody();

@@ -15,6 +15,7 @@
 
 #include "platform/linux/DbusCaller.h"
 #include "platform/linux/DbusValues.h"
+#include "platform/linux/ForeignDbusCaller.h"
 #include "platform/linux/MessagingRig.h"
 #include "platform/linux/PrivateBus.h"
 #include "platform/linux/RpcLimits.h"
@@ -158,6 +159,62 @@ TEST_F(DbusListenerTest, TakesIntegersToTheirEndsAndAnEmptyListAsNone) {
   EXPECT_EQ(requests[4].arguments[0], std::nullopt);
 }
 
+TEST_F(DbusListenerTest, TakesEmptyArraysAndMapsOfWhatAVariantMayHold) {
+  DbusCaller caller(bus.address(), kNames);
+  const DbusReceived answer =
+      caller.ask("TakeMap", "a{sv}", 6, "bytes", "ay", 0, "dates", "a(d)", 0, "variants", "av", 0, "lists",
+                 "aa{sad}", 0, "maps", "a{sa{sv}}", 0, "paths", "ao", 0);
+  ASSERT_EQ(answer.error, "") << answer.text;
+  EXPECT_EQ(*record.requests().at(0).arguments[0]->asMap(), (ValueMap{{"bytes", ValueArray()},
+                                                                      {"dates", ValueArray()},
+                                                                      {"variants", ValueArray()},
+                                                                      {"lists", ValueArray()},
+                                                                      {"maps", ValueMap()},
+                                                                      {"paths", ValueArray()}}));
+}
+
+// The library reads arrays in one piece, but not these.
+TEST_F(DbusListenerTest, TakesWhatAProgramOfTheOtherByteOrderSays) {
+  ForeignDbusCaller caller(bus.address(), kNames);
+  const auto body = [] { return ForeignDbusCaller::body(); };
+  EXPECT_EQ(caller.ask("TakeList", "ax", body().array(8, [](DbusBytes&) {})).error, "");
+  const auto list = [](DbusBytes& numbers) { numbers.number64(INT64_MIN).number64(77).number64(INT64_MAX); };
+  EXPECT_EQ(caller.ask("TakeList", "ax", body().array(8, list)).error, "");
+  EXPECT_EQ(caller.ask("TakeUInt32", "u", body().number32(0x01020304)).error, "");
+  EXPECT_EQ(caller.ask("TakeUInt16", "q", body().number16(0x0102)).error, "");
+  const auto map = [](DbusBytes& entries) {
+    entries.entry("text", "s").string("Gr\xC3\xBC\xC3\x9F");
+    entries.entry("date", "(d)").real(1763634000.5);
+    entries.entry("numbers", "ad").array(8, [](DbusBytes& numbers) { numbers.real(0.5).real(-1e300); });
+    entries.entry("integers", "aq").array(2, [](DbusBytes& numbers) { numbers.number16(1).number16(999); });
+    entries.entry("inner", "a{sa{sax}}").array(8, [](DbusBytes& outer) {
+      outer.align(8).string("one").array(8, [](DbusBytes& inner) {
+        inner.align(8).string("two").array(8, [](DbusBytes& numbers) { numbers.number64(-3); });
+      });
+    });
+  };
+  EXPECT_EQ(caller.ask("TakeTwo", "a{sv}x", body().array(8, map).number64(-77)).error, "");
+
+  const std::vector<ReceivedRequest> requests = record.requests();
+  ASSERT_THAT(requests, SizeIs(5));
+  EXPECT_EQ(requests[0].arguments[0], std::nullopt);
+  EXPECT_EQ(requests[1].arguments[0], Value(ValueArray{INT64_MIN, 77, INT64_MAX}));
+  EXPECT_EQ(requests[2].arguments[0], Value(0x01020304));
+  EXPECT_EQ(requests[3].arguments[0], Value(0x0102));
+  const ValueMap taken = *requests[4].arguments[0]->asMap();
+  EXPECT_EQ(taken, (ValueMap{{"text", "Gr\xC3\xBC\xC3\x9F"},
+                             {"date", Date{1763634000.5}},
+                             {"numbers", ValueArray{0.5, -1e300}},
+                             {"integers", ValueArray{1, 999}},
+                             {"inner", ValueMap{{"one", ValueMap{{"two", ValueArray{-3}}}}}}}))
+      << taken.text();
+  EXPECT_EQ(requests[4].arguments[1], Value(-77));
+
+  const ForeignDbusCaller::Answer answer = caller.ask("TakeInt64", "t", body().number64(1));
+  EXPECT_EQ(answer.error, SD_BUS_ERROR_INVALID_ARGS);
+  EXPECT_EQ(answer.text(), "TakeInt64: argument 1 (number) must be of the type x, not t");
+}
+
 struct WrongCall {
   const char* member;
   std::function<void(sd_bus_message*)> fill;
@@ -196,6 +253,22 @@ TEST_F(DbusListenerTest, RefusesWrongArgumentsInWordsThatNameThem) {
        "TakeMap: argument 1 (map) holds a variant in a variant"},
       {"TakeMap", body("a{sv}", 1, "a", "a{iv}", 0), "TakeMap: argument 1 (map) has a key that is not text"},
       {"TakeMap", body("a{sv}", 1, "a", "a{ov}", 0), "TakeMap: argument 1 (map) has a key that is not text"},
+      // Though there is nothing in them.
+      {"TakeMap", body("a{sv}", 1, "a", "a(ss)", 0),
+       "TakeMap: argument 1 (map) holds a struct other than a date"},
+      {"TakeMap", body("a{sv}", 1, "a", "ah", 0), "TakeMap: argument 1 (map) holds a file descriptor"},
+      {"TakeMap", body("a{sv}", 1, "a", "a{is}", 0), "TakeMap: argument 1 (map) has a key that is not text"},
+      {"TakeMap", body("a{sv}", 1, "a", "a{sh}", 0), "TakeMap: argument 1 (map) holds a file descriptor"},
+      {"TakeMap", body("a{sv}", 1, "a", "aaa(dd)", 0),
+       "TakeMap: argument 1 (map) holds a struct other than a date"},
+      {"TakeMap", body("a{sv}", 1, "a", "a{sa{ya(d)}}", 0),
+       "TakeMap: argument 1 (map) has a key that is not text"},
+      {"TakeMap", body("a{sv}", 1, "a", "av", 1, "a(s)", 0),
+       "TakeMap: argument 1 (map) holds a struct other than a date"},
+      {"TakeMap", body("a{sv}", 1, "a", "av", 1, "v", "i", 1),
+       "TakeMap: argument 1 (map) holds a variant in a variant"},
+      {"TakeTwo", body("a{sv}x", 1, "a", "a(ss)", 0, std::int64_t{1}),
+       "TakeTwo: argument 1 (map) holds a struct other than a date"},
   };
   DbusCaller caller(bus.address(), kNames);
   for (const WrongCall& wrong : calls) {
