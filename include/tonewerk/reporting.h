@@ -57,7 +57,7 @@ extern "C" {
 
 typedef enum twr_status {
   TWR_OK = 0,
-  TWR_INVALID = 1,   /* an argument that cannot be: NULL, text that is not UTF-8, an unbalanced payload */
+  TWR_INVALID = 1,   /* an argument that cannot be: NULL, text that is none, an unbalanced payload */
   TWR_TOO_LARGE = 2, /* does not fit into the payload's memory, the ring or the protocol's frame (1 MiB) */
   TWR_FULL = 3,      /* no room in the queue or the ring: dropped, and counted where it was a message */
   TWR_NO_MEMORY = 4,
@@ -108,7 +108,8 @@ TWR_API twr_status twr_payload_problem(const twr_payload* payload);
 
 /*
  * Puts a value under a name; a name given twice leaves the last. Within a list `name` is NULL. Texts are
- * UTF-8 and end with a zero byte. The daemon understands a name's spaces as underscores.
+ * UTF-8 without Unicode's noncharacters (U+FFFF and the like) and end with a zero byte: TWR_INVALID for
+ * others. The daemon understands a name's spaces as underscores.
  */
 TWR_API twr_status twr_put_bool(twr_payload* payload, const char* name, int value);
 TWR_API twr_status twr_put_int(twr_payload* payload, const char* name, int64_t value);

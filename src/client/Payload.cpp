@@ -65,8 +65,8 @@ void countEntry(twr_payload& payload) {
   }
 }
 
-bool isText(std::string_view text) {
-  return text.size() <= std::numeric_limits<std::uint32_t>::max() && isUtf8(text);
+bool isEntryText(std::string_view text) {
+  return text.size() <= std::numeric_limits<std::uint32_t>::max() && isText(text);
 }
 
 // Puts what `write` packs, under `name` where this is a map.
@@ -79,7 +79,7 @@ twr_status put(twr_payload* payload, const char* name, Write write) {
   Packer packer(room);
   if (name != nullptr) {
     const std::string_view text(name);
-    if (!isText(text)) return mark(*payload, TWR_INVALID);
+    if (!isEntryText(text)) return mark(*payload, TWR_INVALID);
     packer.text(text);
   }
   write(packer);
@@ -92,7 +92,7 @@ twr_status put(twr_payload* payload, const char* name, Write write) {
 twr_status putText(twr_payload* payload, const char* name, std::optional<std::string_view> value) {
   if (payload == nullptr) return TWR_INVALID;
   if (payload->problem != TWR_OK) return static_cast<twr_status>(payload->problem);
-  if (!value || !isText(*value)) return mark(*payload, TWR_INVALID);
+  if (!value || !isEntryText(*value)) return mark(*payload, TWR_INVALID);
   return put(payload, name, [&](Packer& packer) { packer.text(*value); });
 }
 

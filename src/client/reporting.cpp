@@ -222,7 +222,7 @@ twr_status twr_client_kill_service(twr_client* client, twr_reply reply, void* co
 
 twr_status twr_client_request(twr_client* client, const char* method, const twr_payload* parameters,
                               twr_reply reply, void* context) {
-  if (client == nullptr || method == nullptr || !isUtf8(method)) return TWR_INVALID;
+  if (client == nullptr || method == nullptr || !isText(method)) return TWR_INVALID;
   if (parameters != nullptr) {
     const twr_status problem = twr_payload_problem(parameters);
     if (problem != TWR_OK) return problem;

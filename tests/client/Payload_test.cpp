@@ -126,8 +126,8 @@ TEST_F(PayloadTest, NeedsANameInAMapAndNoneInAList) {
   expectProblem(TWR_INVALID);
 }
 
-TEST_F(PayloadTest, RefusesWhatIsNotUtf8) {
-  for (const char* text : {"\xFF", "\xC0\x80", "a\xED\xA0\x80"}) {
+TEST_F(PayloadTest, RefusesWhatTheDaemonTakesForNoText) {
+  for (const char* text : {"\xFF", "\xC0\x80", "a\xED\xA0\x80", "\xEF\xBF\xBF", "a\xEF\xB7\x90"}) {
     twr_payload_init(p, p->bytes, p->capacity);
     EXPECT_EQ(twr_put_text(p, "a", text), TWR_INVALID);
     twr_payload_init(p, p->bytes, p->capacity);

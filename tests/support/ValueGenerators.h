@@ -56,7 +56,7 @@ inline rc::Gen<std::string> text() {
   const auto codePoint =
       rc::gen::oneOf(rc::gen::inRange<std::uint32_t>(0x20, 0x7F), rc::gen::inRange<std::uint32_t>(0, 0x80),
                      rc::gen::element<std::uint32_t>(0, '\n', '\r', '\t', '"', '\'', '\\', 0x7F, 0x80, 0x7FF,
-                                                     0x800, 0xE000, 0xFFFD, 0xFFFF, 0x10000, 0x10FFFF));
+                                                     0x800, 0xE000, 0xFFFC, 0xFFFD, 0x10000, 0x10FFFD));
   return rc::gen::map(rc::gen::container<std::vector<std::uint32_t>>(codePoint), utf8Of);
 }
 

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/DbusArguments.h"
 
+#include <cerrno>
 #include <cmath>
 #include <cstdint>
 #include <limits>
@@ -117,8 +118,10 @@ class ValueReader {
 
   std::string_view text(char kind) {
     const char* text = nullptr;
-    if (sd_bus_message_read_basic(message_, kind, &text) <= 0 || text == nullptr) {
-      malformed();
+    const int result = sd_bus_message_read_basic(message_, kind, &text);
+    if (result <= 0 || text == nullptr) {
+      // The library's own check; what isText() takes, it takes.
+      result == -EBADMSG ? fail("holds text that is not UTF-8 or has a noncharacter") : malformed();
       return {};
     }
     const std::string_view view(text);

@@ -82,10 +82,10 @@ bool RpcFrameVisitor::visit_str(const char* data, std::uint32_t size) {
     return setMethod(text);
   }
   if (isKeyAwaited()) return putKey(text);
-  std::optional<SharedString> shared = texts_.values.find(text);
+  std::optional<SharedString> shared = sharedText(texts_.values, text);
   if (!shared) {
     if (depth_ <= 1) return broken("text that is not UTF-8 in a frame's place for something else");
-    return refuse("holds text that is not UTF-8");
+    return refuse(isUtf8(text) ? "holds text with a noncharacter" : "holds text that is not UTF-8");
   }
   return put(Value(std::move(*shared)));
 }
@@ -251,9 +251,17 @@ bool RpcFrameVisitor::setMethod(std::string_view text) {
   return true;
 }
 
+// A daemon's answer may hold what no client said, such as the name of a process; nobody is to lose a
+// connection over a noncharacter in it.
+std::optional<SharedString> RpcFrameVisitor::sharedText(TextCache& cache, std::string_view text) const {
+  std::optional<SharedString> shared = cache.find(text);
+  if (!shared && frame_.kind == RpcFrame::Kind::kResponse && isUtf8(text)) shared.emplace(text);
+  return shared;
+}
+
 bool RpcFrameVisitor::putKey(std::string_view text) {
-  std::optional<SharedString> shared = texts_.keys.find(text);
-  if (!shared) return refuse("has a key that is not UTF-8");
+  std::optional<SharedString> shared = sharedText(texts_.keys, text);
+  if (!shared) return refuse(isUtf8(text) ? "has a key with a noncharacter" : "has a key that is not UTF-8");
   containers_[depth_ - 1].key = std::move(*shared);
   return true;
 }

@@ -4,6 +4,7 @@
 #include <array>
 #include <cstddef>
 #include <cstdint>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <vector>
@@ -78,6 +79,7 @@ class RpcFrameVisitor {
   bool setMethod(std::string_view text);
   static void putInMap(Container& container, Value value);
   bool putKey(std::string_view text);
+  std::optional<SharedString> sharedText(TextCache& cache, std::string_view text) const;
   // Notes the first value that the protocol does not carry and goes on with a stand-in for it.
   bool refuse(const char* what);
 

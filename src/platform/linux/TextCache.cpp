@@ -6,7 +6,7 @@
 namespace tonewerk {
 
 std::optional<SharedString> TextCache::find(std::string_view text) {
-  if (text.size() > mostBytes_) return isUtf8(text) ? std::optional<SharedString>(text) : std::nullopt;
+  if (text.size() > mostBytes_) return isText(text) ? std::optional<SharedString>(text) : std::nullopt;
   std::size_t& guess = slots_[last_].next;
   last_ = guess;
   if (slots_[guess].text == text) return slots_[guess].text;
@@ -14,7 +14,7 @@ std::optional<SharedString> TextCache::find(std::string_view text) {
   last_ = guess;
   SharedString& kept = slots_[guess].text;
   if (kept == text) return kept;
-  if (!isUtf8(text)) return std::nullopt;
+  if (!isText(text)) return std::nullopt;
   kept = SharedString(text);
   return kept;
 }

@@ -20,7 +20,7 @@ class TextCache {
   // `slots` a power of two. Texts longer than `mostBytes` are never kept.
   TextCache(std::size_t slots, std::size_t mostBytes) : slots_(slots), mostBytes_(mostBytes) {}
 
-  // The text, shared with its earlier users where possible. None when it is not UTF-8.
+  // The text, shared with its earlier users where possible. None when isText() says that it is none.
   std::optional<SharedString> find(std::string_view text);
 
  private:

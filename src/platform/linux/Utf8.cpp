@@ -40,8 +40,21 @@ std::size_t matchingBytes(std::string_view text, std::size_t announced) {
   return count;
 }
 
-// How much of the start of `text` is well-formed.
-std::size_t validBytes(std::string_view text) {
+// Of a well-formed sequence: U+FDD0 to U+FDEF, and the last two of every plane.
+bool isNoncharacter(std::string_view sequence) {
+  if (sequence.size() < 3) return false;
+  const std::size_t last = sequence.size() - 1;
+  const bool endsPlane = byteAt(sequence, last - 1) == 0xBF && byteAt(sequence, last) >= 0xBE;
+  if (sequence.size() == 4) return endsPlane && (byteAt(sequence, 1) & 0x0FU) == 0x0FU;
+  if (byteAt(sequence, 0) != 0xEF) return false;
+  return endsPlane ||
+         (byteAt(sequence, 1) == 0xB7 && byteAt(sequence, 2) >= 0x90 && byteAt(sequence, 2) <= 0xAF);
+}
+
+enum class Noncharacters { kTaken, kRefused };
+
+// How much of the start of `text` is well-formed, and has no noncharacter where they are refused.
+std::size_t validBytes(std::string_view text, Noncharacters noncharacters) {
   std::size_t at = 0;
   while (at < text.size()) {
     // Nearly all text is ASCII: eight bytes at a time while none has its high bit set.
@@ -55,6 +68,7 @@ std::size_t validBytes(std::string_view text) {
     }
     const std::size_t length = utf8CharacterLength(text.substr(at));
     if (length == 0) break;
+    if (noncharacters == Noncharacters::kRefused && isNoncharacter(text.substr(at, length))) break;
     at += length;
   }
   return at;
@@ -67,11 +81,13 @@ std::size_t utf8CharacterLength(std::string_view text) {
   return announced > 0 && matchingBytes(text, announced) == announced ? announced : 0;
 }
 
-bool isUtf8(std::string_view text) { return validBytes(text) == text.size(); }
+bool isUtf8(std::string_view text) { return validBytes(text, Noncharacters::kTaken) == text.size(); }
+
+bool isText(std::string_view text) { return validBytes(text, Noncharacters::kRefused) == text.size(); }
 
 std::string validUtf8(std::string text) {
   std::string_view rest = text;
-  std::size_t valid = validBytes(rest);
+  std::size_t valid = validBytes(rest, Noncharacters::kRefused);
   if (valid == rest.size()) return text;
   std::string repaired;
   repaired.reserve(text.size() + kReplacement.size());
@@ -80,7 +96,7 @@ std::string validUtf8(std::string text) {
     repaired += kReplacement;
     rest.remove_prefix(valid);
     rest.remove_prefix(matchingBytes(rest, announcedLength(byteAt(rest, 0))));
-    valid = validBytes(rest);
+    valid = validBytes(rest, Noncharacters::kRefused);
   }
   repaired += rest;
   return repaired;

@@ -14,9 +14,14 @@ std::size_t utf8CharacterLength(std::string_view text);
 // are text.
 bool isUtf8(std::string_view text);
 
-// `text` with U+FFFD for what is no UTF-8: one for each byte that begins no character, and one for the
-// beginning of a character that goes no further. For texts that others choose and nobody has checked, where
-// they come in: what keeps and sends reports takes no other texts.
+// The same, and none of Unicode's 66 noncharacters (U+FDD0 to U+FDEF, and U+xFFFE and U+xFFFF of every
+// plane): what clients may say. The D-Bus library takes no others, and what is text does not depend on the
+// way that it comes.
+bool isText(std::string_view text);
+
+// `text` with U+FFFD for what isText() does not take: one for each byte that begins no character, one for the
+// beginning of a character that goes no further, and one for a noncharacter. For texts that others choose and
+// nobody has checked, where they come in: what keeps and sends reports takes no other texts.
 std::string validUtf8(std::string text);
 
 }  // namespace tonewerk

@@ -109,8 +109,10 @@ TEST(CleanText, KeepsUtf8AndReplacesEverythingElse) {
            {"Caf\xC3\xA9 \xF0\x9F\x8E\xB5", "Caf\xC3\xA9 \xF0\x9F\x8E\xB5"},
            {"a\nb\x7F", "a?b?"},
            {"\xFF\xC3", "\uFFFD\uFFFD"},
-           {"\xC0\xAF", "\uFFFD\uFFFD"},  // an overlong form
-           {"a\xE2\x82", "a\uFFFD"},      // cut short
+           {"\xC0\xAF", "\uFFFD\uFFFD"},    // an overlong form
+           {"a\xE2\x82", "a\uFFFD"},        // cut short
+           {"a\xEF\xBF\xBFz", "a\uFFFDz"},  // a noncharacter
+           {"\xF0\x9F\xBF\xBE", "\uFFFD"},  // another
        }) {
     EXPECT_EQ(cleanText(c.text), c.clean);
   }

@@ -137,13 +137,31 @@ INSTANTIATE_TEST_SUITE_P(All, DbusArgumentsOrderTest, testing::Values(std::endia
                            return tested.param == std::endian::native ? "ThisMachines" : "TheOther";
                          });
 
-TEST(DbusArgumentsTest, RefusesABodyThatIsNotWhatItsSignatureSays) {
-  std::string body = mapBody();
-  body[body.find("Gr\xC3")] = '\xFF';
-  ReadingEnd end;
-  const std::optional<DbusArguments> read = end.read(messageOf("a{sv}", body));
-  ASSERT_TRUE(read && read->problem);
-  EXPECT_EQ(*read->problem, messagingError(kInvalidArguments, "TakeMap: argument 1 (map) is malformed"));
+// The bus library decides what is text on this way, and isText() on the other.
+TEST(DbusArgumentsTest, RefusesTheTextsThatTheSocketRefuses) {
+  for (const char* text : {"\xFF", "\xED\xA0\x80", "\xEF\xBF\xBE", "\xEF\xBF\xBF", "\xEF\xB7\x90",
+                           "\xEF\xB7\xAF", "\xF0\x9F\xBF\xBE", "\xF4\x8F\xBF\xBF"}) {
+    DbusBytes body;
+    body.array(8, [&](DbusBytes& map) { map.entry("text", "s").string(text); });
+    const std::optional<DbusArguments> read = ReadingEnd().read(messageOf("a{sv}", body.text()));
+    ASSERT_TRUE(read && read->problem) << text;
+    EXPECT_EQ(*read->problem, messagingError(kInvalidArguments,
+                                             "TakeMap: argument 1 (map) holds text that is not UTF-8 or has "
+                                             "a noncharacter"));
+    EXPECT_FALSE(isText(text));
+  }
+}
+
+TEST(DbusArgumentsTest, TakesTheTextsBesideThem) {
+  for (const char* text : {"\xEF\xBF\xBD", "\xEF\xB7\x8F", "\xEF\xB7\xB0", "\xF0\x9F\xBF\xBD",
+                           "\xF0\x90\x80\x80", "\xEE\xBF\xBF"}) {
+    DbusBytes body;
+    body.array(8, [&](DbusBytes& map) { map.entry("text", "s").string(text); });
+    const std::optional<DbusArguments> read = ReadingEnd().read(messageOf("a{sv}", body.text()));
+    ASSERT_TRUE(read && !read->problem) << text;
+    EXPECT_EQ(read->arguments.at(0)->asMap()->text("text"), text);
+    EXPECT_TRUE(isText(text));
+  }
 }
 
 TEST(DbusArgumentsTest, SurvivesWhateverABodyHolds) {

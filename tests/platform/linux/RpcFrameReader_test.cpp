@@ -307,6 +307,9 @@ INSTANTIATE_TEST_SUITE_P(
                     Refused{"TextOverlong", "81 A1 61 A2 C0AF", "holds text that is not UTF-8"},
                     Refused{"TextSurrogate", "A3 EDA080", "holds text that is not UTF-8"},
                     Refused{"KeyNotUtf8", "81 A1 FF 01", "has a key that is not UTF-8"},
+                    Refused{"Noncharacter", "A3 EFBFBF", "holds text with a noncharacter"},
+                    Refused{"DeepNoncharacter", "81 A1 61 A4 F09FBFBE", "holds text with a noncharacter"},
+                    Refused{"KeyNoncharacter", "81 A3 EFB790 01", "has a key with a noncharacter"},
                     Refused{"KeyNumber", "81 01 01", "has a key that is not a text"},
                     Refused{"KeyNil", "81 C0 01", "holds nil"},
                     Refused{"KeyBinary", "81 C4 01 61 01", "holds binary data"},
@@ -316,6 +319,15 @@ INSTANTIATE_TEST_SUITE_P(
                     Refused{"KeyDate", "81 D6 FF 00000000 01", "has a key that is not a text"},
                     Refused{"FirstOfTwo", "92 C0 C4 00", "holds nil"}),
     [](const auto& tested) { return tested.param.name; });
+
+// Some of what a daemon answers comes from elsewhere than its clients, such as a process's name.
+TEST_F(RpcFrameReaderTest, TakesNoncharactersInAnswers) {
+  const std::string frame = fromHex("94 01 07 C0 81 A3 EFBFBF A3 EFB790");
+  std::string_view bytes = frame;
+  ASSERT_EQ(reader.next(bytes), Result::kFrame) << reader.problem();
+  EXPECT_FALSE(reader.frame().refused);
+  EXPECT_EQ(reader.frame().result, Value(ValueMap{{"\xEF\xBF\xBF", "\xEF\xB7\x90"}}));
+}
 
 TEST_F(RpcFrameReaderTest, RefusesMoreArgumentsThanAnyMethodTakes) {
   EXPECT_FALSE(read(requestWith("DC 0010" + std::string(32, '0'))).refused);

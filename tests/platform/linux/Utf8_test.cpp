@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/Utf8.h"
 
+#include <cstdint>
 #include <gmock/gmock.h>
 #include <string>
 
@@ -89,6 +90,32 @@ INSTANTIATE_TEST_SUITE_P(
                     Case{"ThreeWithoutItsThird", "E2 82 41", false},
                     Case{"FourWithoutItsFourth", "F0 9F 98 41", false}),
     [](const auto& tested) { return tested.param.name; });
+
+std::string encoded(std::uint32_t character) {
+  const auto byte = [](std::uint32_t value) { return static_cast<char>(value); };
+  const auto next = [&](unsigned shift) { return byte(0x80U | (character >> shift & 0x3FU)); };
+  if (character < 0x80) return {byte(character)};
+  if (character < 0x800) return {byte(0xC0U | character >> 6U), next(0)};
+  if (character < 0x10000) return {byte(0xE0U | character >> 12U), next(6), next(0)};
+  return {byte(0xF0U | character >> 18U), next(12), next(6), next(0)};
+}
+
+TEST(TextTest, IsEveryCharacterButTheNoncharacters) {
+  int refused = 0;
+  for (std::uint32_t character = 0; character < 0x110000; ++character) {
+    if (character == 0xD800) character = 0xE000;  // past the surrogates
+    const bool isNoncharacter =
+        (character & 0xFFFEU) == 0xFFFEU || (character >= 0xFDD0 && character <= 0xFDEF);
+    const std::string bytes = encoded(character);
+    ASSERT_TRUE(isUtf8(bytes)) << character;
+    ASSERT_EQ(isText(bytes), !isNoncharacter) << character;
+    ASSERT_EQ(isText("a" + bytes + "z"), !isNoncharacter) << character;
+    refused += isNoncharacter ? 1 : 0;
+  }
+  EXPECT_EQ(refused, 66);
+  EXPECT_FALSE(isText("\xFF"));
+  EXPECT_FALSE(isText("\xED\xA0\x80"));
+}
 
 }  // namespace
 }  // namespace tonewerk
