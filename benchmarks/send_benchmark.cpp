@@ -123,7 +123,7 @@ class SendBenchmark {
       appendMessageFrame(
           frame, std::nullopt,
           {TWR_CATEGORY_PLAYBACK, TWR_TYPE_GENERIC, kTime, 0, payload.entries, {payload.bytes, payload.size}},
-          {&id, 1});
+          0, {&id, 1});
       // The sender's turns come each after one of the others, which leave it little in the caches: as in an
       // audio callback, which has had other things to do.
       table.clock.measure([] {});

@@ -276,9 +276,10 @@ TWR_API twr_status twr_session_set_configuration(twr_session* session, const twr
  */
 TWR_API twr_status twr_session_start(twr_session* session, twr_reply stopped, void* context);
 /*
- * A message that finds the queue full is dropped (TWR_FULL); the session's next one that gets through says
- * how many were, under "twreporting_dropped". It is stamped with the time of this call, unless it holds
- * "twreporting_timestamp" (seconds since 1970, a double).
+ * A message that finds the queue full is dropped (TWR_FULL). The first that goes out of what the session or
+ * one of its senders says after that tells how many were, under "twreporting_dropped"; where none follows,
+ * one with nothing else does when the session stops. A message is stamped with the time of this call, unless
+ * it holds "twreporting_timestamp" (seconds since 1970, a double).
  */
 TWR_API twr_status twr_session_send(twr_session* session, uint32_t category, uint16_t type,
                                     const twr_payload* payload, twr_reply reply, void* context);
@@ -310,9 +311,9 @@ TWR_API twr_sender* twr_sender_open(twr_session* session, size_t ring_bytes);
 /*
  * Wait-free: no lock, no allocation, no system call. A message takes its payload and some 40 bytes of the
  * ring. TWR_OK; TWR_FULL when there is no room; TWR_TOO_LARGE or the payload's problem when it can never be
- * sent. What was not taken is counted, and the next message that is taken carries the count
- * ("twreporting_dropped"); where none follows, one with nothing else is sent when the sender is closed.
- * Stamped as by twr_session_send(), to the resolution of the system's coarse clock (1 to 10 ms).
+ * sent. What was not taken is counted, and told as twr_session_send() tells of its own, in one sum with
+ * that; where no message follows, one with nothing else is sent when the sender is closed. Stamped as by
+ * twr_session_send(), to the resolution of the system's coarse clock (1 to 10 ms).
  */
 TWR_API twr_status twr_sender_send(twr_sender* sender, uint32_t category, uint16_t type,
                                    const twr_payload* payload);
@@ -320,7 +321,11 @@ TWR_API twr_status twr_sender_send(twr_sender* sender, uint32_t category, uint16
 /* So far, and for good. Any thread. */
 TWR_API uint64_t twr_sender_dropped(const twr_sender* sender);
 
-/* What lies in the ring still goes out. Not for real-time threads. */
+/*
+ * What lies in the ring still goes out, in its place, as what twr_session_send() was given: where no daemon
+ * takes it at once it moves to the client's queue, if there is none yet as well as after a connection broke;
+ * what finds the queue full is dropped, the newest first, counted and told. Not for real-time threads.
+ */
 TWR_API void twr_sender_close(twr_sender* sender);
 
 /* ---- vocabulary ---- */

@@ -15,10 +15,25 @@ using Kind = SessionChange::Kind;
 
 constexpr std::size_t kLeastReplies = 64;
 
-std::string messageBody(const RingMessage& message, std::span<const std::int64_t> reporterIDs) {
-  std::string body;
-  appendMessageBody(body, message, reporterIDs);
-  return body;
+// What a message counts for in the queue.
+std::size_t bytesOf(std::size_t payloadBytes, std::size_t reporterIDs) {
+  return Command::kOverheadBytes + payloadBytes + kMessageFrameBytes + reporterIDs * kReporterIDBytes;
+}
+
+// A session's message that is to be kept.
+Command commandOf(const RingMessage& message) {
+  Command command;
+  command.message = message;
+  command.message.bytes = {};
+  command.body.assign(reinterpret_cast<const char*>(message.bytes.data()), message.bytes.size());
+  command.bytes = bytesOf(message.bytes.size(), 1);
+  command.lostBefore = message.lostBefore;
+  return command;
+}
+
+// Nothing but the loss of what came before.
+RingMessage lossOf(const twr_session& session, std::uint64_t lostBefore) {
+  return {session.losses.lastCategory(), TWR_TYPE_UNKNOWN, coarseSeconds(), lostBefore, 0, {}};
 }
 
 bool fitsFrame(const ValueMap& configuration) {
@@ -29,6 +44,21 @@ bool fitsFrame(const ValueMap& configuration) {
 
 // A command of a session marks each of its senders' rings.
 std::size_t markBytes(const twr_session& session) { return session.senders.size() * sizeof(RingMark); }
+
+std::vector<RingMark> marksOf(const std::vector<std::shared_ptr<twr_sender>>& senders) {
+  std::vector<RingMark> marks;
+  marks.reserve(senders.size());
+  for (const std::shared_ptr<twr_sender>& sender : senders)
+    marks.push_back({sender, sender->ring.writtenPosition(), sender->isClosed});
+  return marks;
+}
+
+// After everything the session has said so far, and lost. The count comes first: whatever is counted by now
+// was lost before what is written by then.
+void placeLast(Command& command, const twr_session& session) {
+  command.lostBefore = session.losses.count();
+  command.marks = marksOf(session.senders);
+}
 
 }  // namespace
 
@@ -78,32 +108,30 @@ twr_status ClientOutbox::destroy(twr_session& session, PendingReply reply) {
   const std::shared_ptr<twr_session> kept = session.shared_from_this();
   session.isDestroyed = true;
   --liveSessions_;
-  for (const std::shared_ptr<twr_sender>& sender : session.senders) sender->isClosed = true;
-  const twr_status status = change(session, {Kind::kDestroy, TWR_SERVICE_UNKNOWN, {}}, reply);
+  for (const std::shared_ptr<twr_sender>& sender : session.senders) close(*sender);
   absorbClosedRings();
+  const twr_status status = change(session, {Kind::kDestroy, TWR_SERVICE_UNKNOWN, {}}, reply);
   forgetIfGone(session);
   return status;
 }
 
-twr_status ClientOutbox::send(twr_session* session, RingMessage message,
+twr_status ClientOutbox::send(twr_session* session, const RingMessage& message,
                               std::span<const std::int64_t> reporterIDs, PendingReply reply) {
   if (hasEnded_) return TWR_NOT_CONNECTED;
-  Command command;
-  command.bytes = Command::kOverheadBytes + message.bytes.size() + kMessageFrameBytes +
-                  reporterIDs.size() * kReporterIDBytes + (session == nullptr ? 0 : markBytes(*session));
-  if (!queue_.hasRoomForMessage(command.bytes) || (reply && !acceptReply(false))) {
+  const std::size_t bytes =
+      bytesOf(message.bytes.size(), reporterIDs.size()) + (session == nullptr ? 0 : markBytes(*session));
+  if (!queue_.hasRoomForMessage(bytes) || (reply && !acceptReply(false))) {
     ++dropped_;
-    if (session != nullptr) {
-      ++session->dropped;
-      session->droppedCategory = message.category;
-    }
+    if (session != nullptr) session->losses.add(message.category);
     return TWR_FULL;
   }
+  Command command = commandOf(message);
+  command.bytes = bytes;
   if (session != nullptr) {
     command.session = session->shared_from_this();
-    message.dropped = std::exchange(session->dropped, 0);
+  } else {
+    command.reporterIDs.assign(reporterIDs.begin(), reporterIDs.end());
   }
-  command.body = messageBody(message, reporterIDs);
   command.reply = reply;
   add(std::move(command));
   return TWR_OK;
@@ -125,8 +153,7 @@ void ClientOutbox::addBarrier(std::shared_ptr<Waiter> waiter) {
   Command command;
   command.kind = Command::Kind::kBarrier;
   command.waiter = std::move(waiter);
-  for (const std::shared_ptr<twr_sender>& sender : senders_)
-    command.marks.push_back({sender, sender->ring.writtenPosition()});
+  command.marks = marksOf(senders_);
   queue_.add(std::move(command));
 }
 
@@ -140,8 +167,7 @@ bool ClientOutbox::acceptReply(bool isStart) {
 Command& ClientOutbox::add(Command command) {
   if (command.session != nullptr) {
     command.session->lastReconciliation = nullptr;
-    for (const std::shared_ptr<twr_sender>& sender : command.session->senders)
-      command.marks.push_back({sender, sender->ring.writtenPosition()});
+    placeLast(command, *command.session);
   }
   return queue_.add(std::move(command));
 }
@@ -155,6 +181,7 @@ void ClientOutbox::reconcileLater(twr_session& session) {
     session.lastReconciliation = &add(std::move(command));
   }
   *session.lastReconciliation->wanted = session.wanted;
+  placeLast(*session.lastReconciliation, session);
   // A session that came and went without the daemon's having heard of it: nothing is left to be told.
   const bool neverWas = !session.sent.exists && !session.wanted.exists && session.queued == 1;
   if (!neverWas || session.unsent > 0 || !session.senders.empty()) return;
@@ -214,6 +241,9 @@ void ClientOutbox::encodeNext() {
     case Command::Kind::kReconcile:
       return expand(std::move(command));
     case Command::Kind::kMessage:
+      return encodeMessage(std::move(command));
+    case Command::Kind::kLoss:
+      return encodeLoss(std::move(command));
     case Command::Kind::kRequest:
     case Command::Kind::kBarrier:
       break;
@@ -226,17 +256,61 @@ void ClientOutbox::encodeNext() {
   batch_.add(std::move(frame));
 }
 
+void ClientOutbox::encodeMessage(Command command) {
+  OutgoingFrame frame;
+  if (command.reply) frame.identifier = replies_.add({command.reply, nullptr, false});
+  RingMessage message = command.message;
+  message.lostBefore = command.lostBefore;
+  message.bytes = {reinterpret_cast<const unsigned char*>(command.body.data()), command.body.size()};
+  if (command.session == nullptr) {
+    appendMessageFrame(batch_.bytes(), frame.optionalIdentifier(), message, 0, command.reporterIDs);
+    frame.isMessage = true;
+  } else {
+    appendOf(*command.session, message, frame);
+    command.session->told.late += command.lostAfter;
+  }
+  frame.command = std::move(command);
+  batch_.add(std::move(frame));
+}
+
+void ClientOutbox::encodeLoss(Command command) {
+  command.session->told.owes(command.lostBefore) ? encodeMessage(std::move(command))
+                                                 : passOver(std::move(command));
+}
+
+// One that says nothing, but has its place among the others.
+void ClientOutbox::passOver(Command command) {
+  OutgoingFrame frame;
+  frame.toldBefore = command.session->told.counted;
+  command.session->told.late += command.lostAfter;
+  frame.command = std::move(command);
+  batch_.add(std::move(frame));
+}
+
+// A message of the session, with what is owed of its losses.
+void ClientOutbox::appendOf(twr_session& session, const RingMessage& message, OutgoingFrame& frame) {
+  frame.toldBefore = session.told.counted;
+  frame.lateTold = session.told.late;
+  const std::uint64_t dropped = session.told.take(message.lostBefore);
+  frame.bodyAt = appendMessageFrame(batch_.bytes(), frame.optionalIdentifier(), message, dropped,
+                                    {&session.identifier, 1});
+  frame.bodyBytes = message.bytes.size();
+  frame.isMessage = true;
+}
+
 void ClientOutbox::encodeChange(Command command) {
   twr_session& session = *command.session;
+  const SessionChange& change = *command.change;
+  // What was dropped and no message has told of: the last chance while the session runs.
+  if (session.sent.exists && (change.kind == Kind::kStop || change.kind == Kind::kDestroy))
+    appendLoss(session, command.lostBefore);
   OutgoingFrame frame;
+  frame.toldBefore = session.told.counted;
   frame.stateBefore = std::make_unique<SessionState>(session.sent);
   frame.startsBefore = session.starts;
   frame.startCountBefore = session.starts == nullptr ? 0 : session.starts->waiting.size();
 
-  const SessionChange& change = *command.change;
   const bool wasStarted = session.sent.isStarted;
-  if (session.sent.exists && (change.kind == Kind::kStop || change.kind == Kind::kDestroy))
-    appendLoss(session);
   session.sent.apply(change);
   ReplyTable::Entry entry;
   if (change.kind == Kind::kStart) {
@@ -257,6 +331,7 @@ void ClientOutbox::encodeChange(Command command) {
 
   appendFrameHead(batch_.bytes(), frame.optionalIdentifier());
   appendChange(batch_.bytes(), change, session.identifier);
+  session.told.late += command.lostAfter;
   frame.command = std::move(command);
   batch_.add(std::move(frame));
 }
@@ -264,25 +339,25 @@ void ClientOutbox::encodeChange(Command command) {
 // What is still to be done for it takes its place.
 void ClientOutbox::expand(Command reconciliation) {
   std::vector<SessionChange> changes = changesBetween(reconciliation.session->sent, *reconciliation.wanted);
+  if (changes.empty()) return passOver(std::move(reconciliation));
+  std::uint64_t lostAfter = reconciliation.lostAfter;
   for (auto change = changes.rbegin(); change != changes.rend(); ++change) {
     Command command;
     command.kind = Command::Kind::kChange;
     command.session = reconciliation.session;
     command.change = std::make_unique<SessionChange>(std::move(*change));
+    command.lostBefore = reconciliation.lostBefore;
+    command.lostAfter = std::exchange(lostAfter, 0);
     queue_.insert(queue_.begin(), std::move(command));
   }
   queue_.released(reconciliation.bytes);
-  forgetIfGone(*reconciliation.session);
 }
 
 void ClientOutbox::sent(std::size_t bytes) {
   for (OutgoingFrame& frame : batch_.sent(bytes)) {
     Command& command = frame.command;
     queue_.released(command.bytes);
-    const bool isMessage =
-        frame.origin == OutgoingFrame::Origin::kRing ||
-        (frame.origin == OutgoingFrame::Origin::kQueue && command.kind == Command::Kind::kMessage);
-    if (isMessage) ++messagesSent_;
+    if (frame.isMessage) ++messagesSent_;
     if (command.waiter != nullptr) command.waiter->finish(TWR_OK);
     if (command.session != nullptr) forgetIfGone(*command.session);
   }
@@ -314,6 +389,11 @@ void ClientOutbox::disconnected() {
 void ClientOutbox::takeBack(OutgoingFrame frame) {
   if (frame.origin == OutgoingFrame::Origin::kRecreation) return;
   if (frame.identifier != 0) replies_.take(frame.identifier);
+  if (frame.command.session != nullptr) {
+    ToldLosses& told = frame.command.session->told;
+    told.counted = frame.toldBefore;
+    told.late = told.late - frame.command.lostAfter + frame.lateTold;
+  }
   if (frame.stateBefore != nullptr) {
     twr_session& session = *frame.command.session;
     session.sent = std::move(*frame.stateBefore);
@@ -326,7 +406,7 @@ void ClientOutbox::takeBack(OutgoingFrame frame) {
     }
   }
   if (frame.origin == OutgoingFrame::Origin::kRing) {
-    frame.command.bytes = Command::kOverheadBytes + frame.command.body.size();
+    frame.command.bytes = bytesOf(frame.command.body.size(), 1);
     queue_.insert(queue_.begin(), std::move(frame.command));
   } else {
     queue_.putBack(std::move(frame.command));
@@ -371,8 +451,15 @@ std::shared_ptr<twr_sender> ClientOutbox::openSender(twr_session& session, const
 }
 
 void ClientOutbox::closeSender(twr_sender& sender) {
-  sender.isClosed = true;
+  close(sender);
   absorbClosedRings();
+}
+
+void ClientOutbox::close(twr_sender& sender) {
+  if (sender.isClosed) return;  // by its caller, before the session: what was lost since is not its own
+  sender.isClosed = true;
+  if (const std::shared_ptr<twr_session> session = sender.session.lock())
+    sender.lostAtClose = session->losses.count();
 }
 
 bool ClientOutbox::hasRingData() const {
@@ -383,22 +470,22 @@ bool ClientOutbox::hasRingData() const {
 
 // Those of sessions with nothing in the queue that would have to go out first.
 void ClientOutbox::drainQuietRings() {
-  // A closed one goes out of the list when it is empty.
-  for (std::size_t at = 0; at < senders_.size() && !batch_.isFull();) {
+  const auto isQuiet = [](const twr_sender& sender) { return sender.session.lock()->queued == 0; };
+  for (const std::shared_ptr<twr_sender>& sender : senders_)
+    if (isQuiet(*sender) && !drain(*sender, sender->ring.writtenPosition())) return;
+  // Only then: what one of them has lost may lie between what others have said.
+  for (std::size_t at = 0; at < senders_.size();) {
     const std::shared_ptr<twr_sender> sender = senders_[at];
-    const std::shared_ptr<twr_session> session = sender->session.lock();
-    if (session->queued == 0) drain(*sender, sender->ring.writtenPosition());
-    if (at < senders_.size() && senders_[at] == sender) ++at;
+    sender->isClosed&& isQuiet(*sender) ? finish(*sender) : static_cast<void>(++at);
   }
 }
 
 // What had been written to rings when `command` was asked for. False when the batch is full first.
 bool ClientOutbox::drainMarks(Command& command) {
-  while (!command.marks.empty()) {
-    const RingMark& mark = command.marks.back();
+  for (const RingMark& mark : command.marks)
     if (!drain(*mark.sender, mark.position)) return false;
-    command.marks.pop_back();
-  }
+  for (const RingMark& mark : std::exchange(command.marks, {}))
+    if (mark.isClosed) finish(*mark.sender);
   return true;
 }
 
@@ -408,29 +495,35 @@ bool ClientOutbox::drain(twr_sender& sender, std::uint64_t position) {
     if (batch_.isFull()) return false;
     const std::optional<RingMessage> message = sender.ring.front();
     if (!message) break;
-    appendFromRing(*session, *message);
+    appendFromRing(*session, *message, Command::Kind::kMessage);
     sender.ring.pop();
   }
-  if (!sender.isClosed || sender.ring.readPosition() != sender.ring.writtenPosition()) return true;
-  if (const std::optional<RingMessage> loss = sender.ring.unreportedLoss()) appendFromRing(*session, *loss);
-  removeSender(sender);
   return true;
 }
 
-void ClientOutbox::appendFromRing(twr_session& session, RingMessage message) {
-  message.dropped += std::exchange(session.dropped, 0);
-  appendMessageFrame(batch_.bytes(), std::nullopt, message, {&session.identifier, 1});
+// A closed one that has been drained. It may have been finished before.
+void ClientOutbox::finish(twr_sender& sender) {
+  const std::shared_ptr<twr_session> session = sender.session.lock();
+  if (session != nullptr && sender.ring.dropped() > 0) appendLoss(*session, sender.lostAtClose);
+  removeSender(sender);
+}
+
+void ClientOutbox::appendFromRing(twr_session& session, const RingMessage& message, Command::Kind kind) {
   OutgoingFrame frame;
   frame.origin = OutgoingFrame::Origin::kRing;
+  frame.command.kind = kind;
   frame.command.session = session.shared_from_this();
+  frame.command.message = message;
+  frame.command.message.bytes = {};
+  frame.command.lostBefore = message.lostBefore;
+  appendOf(session, message, frame);
   batch_.add(std::move(frame));
   ++ringMessages_;
 }
 
-// What was dropped and no message has told of: the last chance while the session runs.
-void ClientOutbox::appendLoss(twr_session& session) {
-  if (session.dropped == 0) return;
-  appendFromRing(session, {session.droppedCategory, TWR_TYPE_UNKNOWN, coarseSeconds(), 0, 0, {}});
+void ClientOutbox::appendLoss(twr_session& session, std::uint64_t lostBefore) {
+  if (!session.told.owes(lostBefore)) return;
+  appendFromRing(session, lossOf(session, lostBefore), Command::Kind::kLoss);
 }
 
 // Nobody takes what is in them, or too slowly: it goes to the queue, within its bound.
@@ -448,48 +541,67 @@ void ClientOutbox::absorbClosedRings() {
 
 // What had been written when something in the queue was asked for goes before it.
 void ClientOutbox::absorb(twr_sender& sender) {
-  const std::shared_ptr<twr_session> session = sender.session.lock();
-  const std::uint64_t end = sender.ring.writtenPosition();
-  auto lossPlace = queue_.end();
+  auto closing = queue_.end();  // what was asked for next after the close
+  bool isWhole = true;
   for (auto place = queue_.begin(); place != queue_.end(); ++place) {
     const auto mark = std::find_if(place->marks.begin(), place->marks.end(),
                                    [&](const RingMark& held) { return held.sender.get() == &sender; });
     if (mark == place->marks.end()) continue;
-    absorbUpTo(sender, mark->position, place);
-    if (mark->position == end && lossPlace == queue_.end()) lossPlace = place;
+    isWhole = absorbUpTo(sender, mark->position, place) && isWhole;
+    if (mark->isClosed && closing == queue_.end()) closing = place;
     place->marks.erase(mark);
   }
-  absorbUpTo(sender, end, queue_.end());
-  if (const std::optional<RingMessage> loss = sender.ring.unreportedLoss())
-    absorbMessage(*session, *loss, lossPlace);
+  isWhole = absorbUpTo(sender, sender.ring.writtenPosition(), queue_.end()) && isWhole;
+  if (!isWhole || sender.ring.dropped() > 0) absorbLoss(sender, closing);
   removeSender(sender);
 }
 
-void ClientOutbox::absorbUpTo(twr_sender& sender, std::uint64_t position, CommandQueue::Iterator place) {
+// False when something was lost.
+bool ClientOutbox::absorbUpTo(twr_sender& sender, std::uint64_t position, CommandQueue::Iterator place) {
   const std::shared_ptr<twr_session> session = sender.session.lock();
+  std::uint64_t lost = 0;
+  bool isWhole = true;
   while (sender.ring.readPosition() < position) {
     const std::optional<RingMessage> message = sender.ring.front();
-    if (!message) return;
-    absorbMessage(*session, *message, place);
+    if (!message) break;
+    if (hasEnded_ || !queue_.hasRoomForMessage(bytesOf(message->bytes.size(), 1))) {
+      ++lost;
+      ++dropped_;
+      session->losses.setLastCategory(message->category);
+      isWhole = false;
+    } else {
+      loseBefore(place, *session, std::exchange(lost, 0));
+      insert(place, *session, commandOf(*message));
+    }
     sender.ring.pop();
   }
+  loseBefore(place, *session, lost);
+  return isWhole;
 }
 
-void ClientOutbox::absorbMessage(twr_session& session, RingMessage message, CommandQueue::Iterator place) {
-  Command command;
-  command.bytes = Command::kOverheadBytes + message.bytes.size() + kMessageFrameBytes;
-  if (hasEnded_ || !queue_.hasRoomForMessage(command.bytes)) {
-    const std::uint64_t itself = message.entries == 0 && message.type == TWR_TYPE_UNKNOWN ? 0 : 1;
-    dropped_ += itself;
-    session.dropped += message.dropped + itself;
-    session.droppedCategory = message.category;
-    return;
-  }
-  message.dropped += std::exchange(session.dropped, 0);
-  command.body = messageBody(message, {&session.identifier, 1});
+// Without room it is told by the session's next message, or its end.
+void ClientOutbox::absorbLoss(twr_sender& sender, CommandQueue::Iterator place) {
+  const std::shared_ptr<twr_session> session = sender.session.lock();
+  Command command = commandOf(lossOf(*session, sender.lostAtClose));
+  command.kind = Command::Kind::kLoss;
+  if (!hasEnded_ && queue_.hasRoomForChange(command.bytes)) insert(place, *session, std::move(command));
+}
+
+void ClientOutbox::insert(CommandQueue::Iterator place, twr_session& session, Command command) {
   command.session = session.shared_from_this();
   session.lastReconciliation = nullptr;
   queue_.insert(place, std::move(command));
+}
+
+// So many of the session's, which had been taken: after what it asked for last before `place`.
+void ClientOutbox::loseBefore(CommandQueue::Iterator place, twr_session& session, std::uint64_t lost) {
+  if (lost == 0) return;
+  while (place != queue_.begin()) {
+    if ((--place)->session.get() != &session) continue;
+    place->lostAfter += lost;
+    return;
+  }
+  session.told.late += lost;
 }
 
 void ClientOutbox::removeSender(twr_sender& sender) {

@@ -56,7 +56,7 @@ class ClientOutbox {
   // The same with a destroying change; the session's senders are closed.
   twr_status destroy(twr_session& session, PendingReply reply);
   // A message, to a session or (null) to `reporterIDs`. TWR_FULL: dropped and counted.
-  twr_status send(twr_session* session, RingMessage message, std::span<const std::int64_t> reporterIDs,
+  twr_status send(twr_session* session, const RingMessage& message, std::span<const std::int64_t> reporterIDs,
                   PendingReply reply);
   twr_status request(std::string body, PendingReply reply);
   // Finishes `waiter` when everything before has gone out, or when that failed.
@@ -97,20 +97,28 @@ class ClientOutbox {
   void fill();
   void recreate(twr_session& session);
   void encodeNext();
+  void encodeMessage(Command command);
+  void encodeLoss(Command command);
+  void passOver(Command command);
   void encodeChange(Command command);
+  void appendOf(twr_session& session, const RingMessage& message, OutgoingFrame& frame);
   void expand(Command reconciliation);
   void takeBack(OutgoingFrame frame);
 
   bool hasRingData() const;
+  void close(twr_sender& sender);
   void drainQuietRings();
   bool drainMarks(Command& command);
   bool drain(twr_sender& sender, std::uint64_t position);
-  void appendFromRing(twr_session& session, RingMessage message);
-  void appendLoss(twr_session& session);
+  void finish(twr_sender& sender);
+  void appendFromRing(twr_session& session, const RingMessage& message, Command::Kind kind);
+  void appendLoss(twr_session& session, std::uint64_t lostBefore);
   void absorbClosedRings();
   void absorb(twr_sender& sender);
-  void absorbUpTo(twr_sender& sender, std::uint64_t position, CommandQueue::Iterator place);
-  void absorbMessage(twr_session& session, RingMessage message, CommandQueue::Iterator place);
+  bool absorbUpTo(twr_sender& sender, std::uint64_t position, CommandQueue::Iterator place);
+  void absorbLoss(twr_sender& sender, CommandQueue::Iterator place);
+  void insert(CommandQueue::Iterator place, twr_session& session, Command command);
+  void loseBefore(CommandQueue::Iterator place, twr_session& session, std::uint64_t lost);
   void removeSender(twr_sender& sender);
 
   void deliver(const PendingReply& reply, const std::shared_ptr<DecodedAnswer>& answer);

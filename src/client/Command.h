@@ -9,6 +9,7 @@
 #include <utility>
 #include <vector>
 
+#include "client/MessageRing.h"
 #include "client/PendingReply.h"
 #include "client/SessionState.h"
 #include "tonewerk/reporting.h"
@@ -33,12 +34,14 @@ struct Waiter {
 struct RingMark {
   std::shared_ptr<twr_sender> sender;
   std::uint64_t position = 0;
+  bool isClosed = false;  // already: nothing more was to come
 };
 
 // Something that waits to be sent.
 struct Command {
   enum class Kind {
-    kMessage,    // `body`
+    kMessage,    // `message`, the bytes of its payload in `body`
+    kLoss,       // nothing but what `session` has lost and no message has told, if there is something
     kRequest,    // `body`
     kChange,     // `change` of `session`
     kReconcile,  // whatever leads `session` to `wanted`
@@ -50,6 +53,8 @@ struct Command {
 
   Kind kind = Kind::kMessage;
   std::shared_ptr<twr_session> session;  // null for the client's own
+  RingMessage message{};
+  std::vector<std::int64_t> reporterIDs;  // of a message without a session
   std::string body;
   PendingReply reply;
   std::vector<RingMark> marks;
@@ -57,6 +62,9 @@ struct Command {
   std::unique_ptr<SessionState> wanted;
   std::shared_ptr<Waiter> waiter;
   std::size_t bytes = 0;  // what it counts for in the queue's bound
+
+  std::uint64_t lostBefore = 0;  // of the session, when it was asked for
+  std::uint64_t lostAfter = 0;   // of messages that were taken, and would have come next
 };
 
 }  // namespace tonewerk

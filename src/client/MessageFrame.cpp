@@ -63,23 +63,20 @@ bool isStamped(std::string_view bytes) {
 
 }  // namespace
 
-void appendMessageFrame(std::string& out, std::optional<std::uint32_t> requestIdentifier,
-                        const RingMessage& message, std::span<const std::int64_t> reporterIDs) {
-  appendFrameHead(out, requestIdentifier);
-  appendMessageBody(out, message, reporterIDs);
-}
-
-void appendMessageBody(std::string& out, const RingMessage& message,
-                       std::span<const std::int64_t> reporterIDs) {
+std::size_t appendMessageFrame(std::string& out, std::optional<std::uint32_t> requestIdentifier,
+                               const RingMessage& message, std::uint64_t dropped,
+                               std::span<const std::int64_t> reporterIDs) {
   const std::string_view bytes(reinterpret_cast<const char*>(message.bytes.data()), message.bytes.size());
   const bool stamps = !isStamped(bytes);
-  const bool tellsLoss = message.dropped > 0;
+  const bool tellsLoss = dropped > 0;
 
+  appendFrameHead(out, requestIdentifier);
   StringOutput output{out};
   RpcPacker packer(output);
   packer.text("sendMessage");
   packer.pack_array(4);
   packer.pack_map(message.entries + (stamps ? 1U : 0U) + (tellsLoss ? 1U : 0U));
+  const std::size_t payloadAt = out.size();
   out.append(bytes);
   if (stamps) {
     packer.text(kTimestamp);
@@ -87,16 +84,17 @@ void appendMessageBody(std::string& out, const RingMessage& message,
   }
   if (tellsLoss) {
     packer.text(kDropped);
-    packer.pack_uint64(message.dropped);
+    packer.pack_uint64(dropped);
   }
   packer.pack_uint32(message.category);
   packer.pack_uint16(message.type);
   if (reporterIDs.empty()) {
     packer.pack_nil();
-    return;
+    return payloadAt;
   }
   packer.pack_array(static_cast<std::uint32_t>(reporterIDs.size()));
   for (const std::int64_t identifier : reporterIDs) packer.pack_int64(identifier);
+  return payloadAt;
 }
 
 }  // namespace tonewerk

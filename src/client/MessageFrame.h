@@ -24,11 +24,10 @@ constexpr bool fitsMessageFrame(std::size_t payloadBytes, std::size_t reporterID
 
 // Appends a "sendMessage" frame: a request, or without an identifier a notification. To the payload's own
 // entries come "twreporting_timestamp", unless one of them is called so, and "twreporting_dropped" where
-// something was. Without reporter identifiers the message is for every started session.
-void appendMessageFrame(std::string& out, std::optional<std::uint32_t> requestIdentifier,
-                        const RingMessage& message, std::span<const std::int64_t> reporterIDs);
-// The same without how frames begin: a body, as requests have one (client/RequestBody.h).
-void appendMessageBody(std::string& out, const RingMessage& message,
-                       std::span<const std::int64_t> reporterIDs);
+// some were that nobody has told of. Without reporter identifiers the message is for every started session.
+// Where in `out` the payload's own entries begin.
+std::size_t appendMessageFrame(std::string& out, std::optional<std::uint32_t> requestIdentifier,
+                               const RingMessage& message, std::uint64_t dropped,
+                               std::span<const std::int64_t> reporterIDs);
 
 }  // namespace tonewerk

@@ -27,7 +27,7 @@ std::size_t capacityFor(std::size_t bytes) {
 
 struct MessageRing::Header {
   double time;
-  std::uint64_t dropped;
+  std::uint64_t lostBefore;
   std::uint32_t category;
   std::uint32_t entries;
   std::uint32_t bytes;
@@ -41,7 +41,8 @@ double coarseSeconds() {
   return static_cast<double>(now.tv_sec) + static_cast<double>(now.tv_nsec) / 1e9;
 }
 
-MessageRing::MessageRing(std::size_t bytes) : memory_(capacityFor(bytes)) {
+MessageRing::MessageRing(std::size_t bytes, LossCount& losses)
+    : memory_(capacityFor(bytes)), losses_(losses) {
   static_assert(sizeof(Header) == kHeaderBytes && kHeaderBytes % kAlignmentBytes == 0);
 }
 
@@ -52,12 +53,9 @@ twr_status MessageRing::push(std::uint32_t category, std::uint16_t type, const t
   const std::uint64_t written = written_.load(std::memory_order_relaxed);
   if (!hasRoom(written, needed)) return drop(category, TWR_FULL);
 
-  const std::uint64_t dropped = dropped_.load(std::memory_order_relaxed);
-  const Header header{
-      coarseSeconds(), dropped - droppedBefore_, category, payload.entries, payload.size, type, 0};
+  const Header header{coarseSeconds(), losses_.count(), category, payload.entries, payload.size, type, 0};
   copyIn(written, &header, sizeof(header));
   copyIn(written + sizeof(header), payload.bytes, payload.size);
-  droppedBefore_ = dropped;
   written_.store(written + needed, std::memory_order_release);
   return TWR_OK;
 }
@@ -69,28 +67,18 @@ std::optional<RingMessage> MessageRing::front() {
   Header header{};
   copyOut(read, &header, sizeof(header));
   frontBytes_ = kHeaderBytes + aligned(header.bytes);
-  frontDropped_ = header.dropped;
-  return RingMessage{header.category, header.type,    header.time,
-                     header.dropped,  header.entries, bytesAt(read + kHeaderBytes, header.bytes)};
+  return RingMessage{header.category,   header.type,    header.time,
+                     header.lostBefore, header.entries, bytesAt(read + kHeaderBytes, header.bytes)};
 }
 
 void MessageRing::pop() {
   assert(frontBytes_ > 0);
-  reportedDropped_ += frontDropped_;
   read_.store(read_.load(std::memory_order_relaxed) + frontBytes_, std::memory_order_release);
   frontBytes_ = 0;
 }
 
-std::optional<RingMessage> MessageRing::unreportedLoss() {
-  const std::uint64_t lost = dropped() - reportedDropped_;
-  if (lost == 0) return std::nullopt;
-  reportedDropped_ += lost;
-  return RingMessage{
-      lastDroppedCategory_.load(std::memory_order_relaxed), TWR_TYPE_UNKNOWN, coarseSeconds(), lost, 0, {}};
-}
-
 twr_status MessageRing::drop(std::uint32_t category, twr_status why) {
-  lastDroppedCategory_.store(category, std::memory_order_relaxed);
+  losses_.add(category);
   dropped_.store(dropped_.load(std::memory_order_relaxed) + 1, std::memory_order_release);
   return why;
 }

@@ -8,6 +8,7 @@
 #include <span>
 #include <vector>
 
+#include "client/LossCount.h"
 #include "tonewerk/reporting.h"
 
 namespace tonewerk {
@@ -17,7 +18,7 @@ struct RingMessage {
   std::uint32_t category;
   std::uint16_t type;
   double time;                           // seconds since 1970
-  std::uint64_t dropped;                 // since the message before
+  std::uint64_t lostBefore;              // of its session, since that was made
   std::uint32_t entries;                 // of its map, which `bytes` hold one after the other
   std::span<const unsigned char> bytes;  // MessagePack, without the map's header
 };
@@ -31,7 +32,7 @@ double coarseSeconds();
 //
 // One thread at a time on each side. Wait-free on both: neither ever waits for the other, and the producer
 // makes no system call, takes no lock and allocates nothing. A message that finds no room is dropped and
-// counted; the next one that is taken carries the count.
+// counted, here and as the session's.
 class MessageRing {
  public:
   // A message's own, next to its bytes, which are rounded up to a multiple of kAlignmentBytes.
@@ -40,8 +41,8 @@ class MessageRing {
   static constexpr std::size_t kLeastBytes = 64;
 
   // Rounds up to a power of two of at least kLeastBytes and at most TWR_MOST_RING_BYTES, and touches the
-  // memory, so that no page of it is missing later.
-  explicit MessageRing(std::size_t bytes);
+  // memory, so that no page of it is missing later. `losses` outlives the producer.
+  MessageRing(std::size_t bytes, LossCount& losses);
   MessageRing(const MessageRing&) = delete;
   MessageRing& operator=(const MessageRing&) = delete;
 
@@ -62,10 +63,6 @@ class MessageRing {
   std::uint64_t readPosition() const { return read_.load(std::memory_order_acquire); }
   std::uint64_t dropped() const { return dropped_.load(std::memory_order_acquire); }
 
-  // Consumer, after the producer is done and the last message popped: what was dropped since, as a message
-  // without entries, of the last dropped one's category and of TWR_TYPE_UNKNOWN. Once.
-  std::optional<RingMessage> unreportedLoss();
-
  private:
   struct Header;
 
@@ -80,18 +77,15 @@ class MessageRing {
   static constexpr std::size_t kCacheLineBytes = 64;
 
   std::vector<unsigned char> memory_;
+  LossCount& losses_;
 
   alignas(kCacheLineBytes) std::atomic<std::uint64_t> written_{0};
   std::atomic<std::uint64_t> dropped_{0};
-  std::atomic<std::uint32_t> lastDroppedCategory_{0};
-  std::uint64_t droppedBefore_ = 0;  // the last message taken
   std::uint64_t seenRead_ = 0;
 
   alignas(kCacheLineBytes) std::atomic<std::uint64_t> read_{0};
   std::uint64_t seenWritten_ = 0;
-  std::uint64_t reportedDropped_ = 0;
   std::size_t frontBytes_ = 0;
-  std::uint64_t frontDropped_ = 0;
   std::vector<unsigned char> joined_;  // the bytes of a front that goes over the ring's end
 };
 

@@ -3,7 +3,6 @@
 
 #include <utility>
 
-#include "client/RequestBody.h"
 #include "client/SessionRecord.h"
 
 namespace tonewerk {
@@ -26,7 +25,6 @@ std::vector<OutgoingFrame> OutgoingBatch::sent(std::size_t count) {
   sent_ += count;
   std::vector<OutgoingFrame> gone;
   while (!frames_.empty() && frames_.front().end <= sent_) {
-    sentFrames_ = frames_.front().end;
     countUnsent(frames_.front().frame, false);
     gone.push_back(std::move(frames_.front().frame));
     frames_.pop_front();
@@ -37,15 +35,12 @@ std::vector<OutgoingFrame> OutgoingBatch::sent(std::size_t count) {
 
 std::vector<OutgoingFrame> OutgoingBatch::takeBack() {
   std::vector<OutgoingFrame> back;
-  std::size_t begin = sentFrames_;
   for (Entry& entry : frames_) {
-    if (entry.frame.origin == OutgoingFrame::Origin::kRing) {
-      const std::size_t body = begin + kNotificationHeadBytes;
-      entry.frame.command.body = bytes_.substr(body, entry.end - body);
-    }
-    begin = entry.end;
-    countUnsent(entry.frame, false);
-    back.push_back(std::move(entry.frame));
+    OutgoingFrame& frame = entry.frame;
+    if (frame.origin == OutgoingFrame::Origin::kRing)
+      frame.command.body = bytes_.substr(frame.bodyAt, frame.bodyBytes);
+    countUnsent(frame, false);
+    back.push_back(std::move(frame));
   }
   frames_.clear();
   clear();
@@ -57,7 +52,6 @@ void OutgoingBatch::clear() {
   if (bytes_.capacity() > 2 * kFullBytes) bytes_ = std::string();
   bytes_.clear();
   sent_ = 0;
-  sentFrames_ = 0;
 }
 
 }  // namespace tonewerk

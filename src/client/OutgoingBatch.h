@@ -20,12 +20,18 @@ struct OutgoingFrame {
   enum class Origin { kQueue, kRing, kRecreation };
 
   Origin origin = Origin::kQueue;
-  Command command;               // of a ring without its body, which is in the batch
+  Command command;         // of a ring without its body, which is in the batch:
+  std::size_t bodyAt = 0;  // there
+  std::size_t bodyBytes = 0;
   std::uint32_t identifier = 0;  // of a request; 0 for a notification
   // Of what changes a session: how it was before.
   std::unique_ptr<SessionState> stateBefore;
   std::shared_ptr<StartReplies> startsBefore;
   std::size_t startCountBefore = 0;
+  bool isMessage = false;
+  // Of what a session is told or says: how its losses had been told before.
+  std::uint64_t toldBefore = 0;
+  std::uint64_t lateTold = 0;
 
   std::optional<std::uint32_t> optionalIdentifier() const {
     return identifier == 0 ? std::nullopt : std::optional(identifier);
@@ -64,7 +70,6 @@ class OutgoingBatch {
 
   std::string bytes_;
   std::size_t sent_ = 0;
-  std::size_t sentFrames_ = 0;  // where the first frame begins that has not gone out
   std::deque<Entry> frames_;
 };
 

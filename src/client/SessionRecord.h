@@ -7,6 +7,7 @@
 #include <memory>
 #include <vector>
 
+#include "client/LossCount.h"
 #include "client/MessageRing.h"
 #include "client/PendingReply.h"
 #include "client/SessionState.h"
@@ -20,7 +21,7 @@ struct Command;
 // What callers hold of a session, and what the client knows of it. It stays, without its caller, until the
 // daemon has been told of its end.
 //
-// Everything but `engine` and `identifier` is guarded by the engine's mutex.
+// Everything but `engine`, `identifier` and `losses` is guarded by the engine's mutex.
 struct twr_session : std::enable_shared_from_this<twr_session> {  // NOLINT(readability-identifier-naming)
   twr_session(tonewerk::ClientEngine& client, std::int64_t reporterID)
       : engine(client), identifier(reporterID) {}
@@ -36,10 +37,10 @@ struct twr_session : std::enable_shared_from_this<twr_session> {  // NOLINT(read
   // Those who wait for the present run to stop; null when nobody does.
   std::shared_ptr<tonewerk::StartReplies> starts;
 
-  std::uint64_t dropped = 0;          // since the message before
-  std::uint32_t droppedCategory = 0;  // of the last of them
-  std::size_t queued = 0;             // commands that wait in the queue
-  std::size_t unsent = 0;             // frames that are being sent
+  tonewerk::LossCount losses;
+  tonewerk::ToldLosses told;
+  std::size_t queued = 0;  // commands that wait in the queue
+  std::size_t unsent = 0;  // frames that are being sent
   // The last command in the queue, when it is one that leads to a state; nothing of the session follows it.
   tonewerk::Command* lastReconciliation = nullptr;
 
@@ -49,10 +50,12 @@ struct twr_session : std::enable_shared_from_this<twr_session> {  // NOLINT(read
 // What a real-time thread holds.
 struct twr_sender {  // NOLINT(readability-identifier-naming)
   twr_sender(const std::shared_ptr<twr_session>& owner, const std::atomic<bool>& isForked, std::size_t bytes)
-      : session(owner), hasForked(isForked), ring(bytes) {}
+      : session(owner), hasForked(isForked), ring(bytes, owner->losses) {}
 
   const std::weak_ptr<twr_session> session;
   const std::atomic<bool>& hasForked;
   tonewerk::MessageRing ring;
-  bool isClosed = false;  // under the engine's mutex
+  // Under the engine's mutex.
+  bool isClosed = false;
+  std::uint64_t lostAtClose = 0;  // of the session
 };

@@ -48,6 +48,12 @@ class ClientOutboxTest : public testing::Test {
     return sender.ring.push(14, 0, payload);
   }
 
+  twr_status pushLarge(twr_sender& sender, std::size_t bytes, std::int64_t number = 0) {
+    message(number);
+    twr_put_text(&payload, "text", std::string(bytes, 'x').c_str());
+    return sender.ring.push(14, 0, payload);
+  }
+
   static std::string said(int number, const std::string& more = "", std::int64_t identifier = 77) {
     return "sendMessage {\"n\":" + std::to_string(number) + ",\"twreporting_timestamp\":1.0" + more +
            "} 14 0 [" + std::to_string(identifier) + "]";
@@ -74,6 +80,22 @@ class ClientOutboxTest : public testing::Test {
       outbox->sent(bytes.size());
       if (bytes.empty()) return texts;
     }
+  }
+  // Up to so many bytes go out, and `take` gets the frames that are whole with them. False when there was
+  // nothing.
+  template <class Take>
+  bool saySome(std::size_t most, Take take) {
+    const std::string bytes(outbox->unsent());
+    const std::size_t count = std::min(most, bytes.size());
+    arriving += bytes.substr(0, count);
+    outbox->sent(count);
+    std::size_t used = 0;
+    for (const RpcFrame& frame : framesOf(arriving)) {
+      take(frame);
+      used += frame.wireBytes;
+    }
+    arriving.erase(0, used);
+    return !bytes.empty();
   }
   void answer(const std::string& method) {
     RpcFrame response;
@@ -107,6 +129,7 @@ class ClientOutboxTest : public testing::Test {
   std::atomic<bool> hasForked{false};
   std::unique_ptr<ClientOutbox> outbox = std::make_unique<ClientOutbox>(65536, deliveries);
   std::map<std::string, std::uint32_t> requests;
+  std::string arriving;
 };
 
 TEST_F(ClientOutboxTest, MakesSessionsAgainAsTheyWere) {
@@ -442,9 +465,155 @@ TEST_F(ClientOutboxTest, KeepsWhatAClosedSenderLeavesWithoutADaemonInItsPlace) {
   const std::vector<std::string> all = sayAll();
   ASSERT_EQ(all.size(), 5U);
   EXPECT_EQ(all[1], said(1));
-  EXPECT_THAT(all[2], testing::HasSubstr("\"twreporting_dropped\":1"));
-  EXPECT_EQ(all[3], "startReportingSessionForID 77");
+  EXPECT_EQ(all[2], "startReportingSessionForID 77");
+  EXPECT_THAT(all[3], testing::HasSubstr("\"twreporting_dropped\":1"));
   EXPECT_EQ(all[4], "destroyReportingSession 77");
+}
+
+// It is the same promise whether there has been a connection or not.
+TEST_F(ClientOutboxTest, KeepsOfAClosedSenderWhatTheQueueHasRoomForAndTellsTheRestAtItsPlace) {
+  for (const bool wasConnected : {false, true}) {
+    SCOPED_TRACE(wasConnected ? "a connection broke" : "there was none yet");
+    makeOutbox(2200);
+    const auto one = session();
+    if (wasConnected) outbox->connected();
+    const auto sender = outbox->openSender(*one, hasForked, 4096);
+    push(*sender, 1);
+    pushLarge(*sender, 700);
+    push(*sender, 2);
+    pushLarge(*sender, 700);  // one too many
+    push(*sender, 3);
+    pushLarge(*sender, 600);  // two too many
+    outbox->closeSender(*sender);
+    if (wasConnected) outbox->disconnected();
+    EXPECT_FALSE(outbox->hasSenders());
+    EXPECT_EQ(outbox->messagesDropped(), 2U);
+    EXPECT_EQ(send(*one, 4), TWR_FULL);
+    outbox->connected();
+    std::vector<std::string> all = sayAll();
+    ASSERT_EQ(all.size(), 6U);
+    EXPECT_EQ(all[1], said(1));
+    EXPECT_THAT(all[2], testing::Not(testing::HasSubstr("twreporting_dropped")));
+    EXPECT_EQ(all[3], said(2));
+    EXPECT_EQ(all[4], said(3, ",\"twreporting_dropped\":1"));
+    EXPECT_THAT(all[5], testing::HasSubstr("\"twreporting_dropped\":1"));
+    EXPECT_THAT(all[5], testing::HasSubstr(" 14 65535 [77]"));
+    send(*one, 5);
+    EXPECT_THAT(sayAll(), ElementsAre(said(5, ",\"twreporting_dropped\":1")));
+  }
+}
+
+TEST_F(ClientOutboxTest, TellsALossWithTheFirstMessageAfterItWhoeverLostAndWhoeverSaysThat) {
+  const auto one = session();
+  outbox->connected();
+  const auto sender = outbox->openSender(*one, hasForked, 128);
+  push(*sender, 1);
+  EXPECT_EQ(push(*sender, 2), TWR_FULL);
+  EXPECT_EQ(push(*sender, 3), TWR_FULL);
+  send(*one, 4);
+  EXPECT_THAT(sayAll(),
+              ElementsAre("createReportingSession 77", said(1), said(4, ",\"twreporting_dropped\":2")));
+  push(*sender, 5);
+  EXPECT_THAT(sayAll(), ElementsAre(said(5)));
+}
+
+// The first message of the ring told what the queue had dropped long after it.
+TEST_F(ClientOutboxTest, TellsNoLossWithAMessageThatWasSaidBeforeIt) {
+  makeOutbox(4096);
+  const auto one = session();
+  const auto sender = outbox->openSender(*one, hasForked, TWR_DEFAULT_RING_BYTES);
+  std::vector<std::string> expected{"createReportingSession 77"};
+  int lost = 0;
+  for (int number = 1; number <= 400; ++number) {
+    const bool isTaken = (number % 3 == 0 ? push(*sender, number) : send(*one, number)) == TWR_OK;
+    if (isTaken) {
+      expected.push_back(said(number, lost == 0 ? "" : ",\"twreporting_dropped\":" + std::to_string(lost)));
+    }
+    lost = isTaken ? 0 : lost + 1;
+  }
+  ASSERT_GT(expected.size(), 140U);
+  outbox->connected();
+  EXPECT_EQ(sayAll(), expected);
+}
+
+TEST_F(ClientOutboxTest, TellsALossOfOneSenderAmongWhatAnotherHasSaid) {
+  for (const bool lostFirst : {false, true}) {
+    const auto one = session();
+    outbox->connected();
+    sayAll();
+    auto losing = outbox->openSender(*one, hasForked, 128);
+    auto other = outbox->openSender(*one, hasForked, 4096);
+    if (lostFirst) std::swap(one->senders[0], one->senders[1]);
+    push(*other, 1);
+    push(*losing, 2);
+    EXPECT_EQ(push(*losing, 3), TWR_FULL);
+    push(*other, 4);
+    outbox->destroy(*one, {});
+    std::vector<std::string> all = sayAll();
+    ASSERT_EQ(all.size(), 4U);
+    EXPECT_EQ(all.back(), "destroyReportingSession 77");
+    EXPECT_EQ(std::count(all.begin(), all.end(), said(1)), 1);
+    EXPECT_EQ(std::count(all.begin(), all.end(), said(2)), 1);
+    EXPECT_EQ(std::count(all.begin(), all.end(), said(4, ",\"twreporting_dropped\":1")), 1);
+  }
+}
+
+// Whatever is taken or dropped, by the session or its sender, at the call or when a closed sender's ring goes
+// to the queue; however little goes out at a time, and wherever the connection breaks.
+TEST_F(ClientOutboxTest, TellsEveryLossAtItsPlaceHoweverMessagesMix) {
+  for (unsigned seed = 0; seed < 100; ++seed) {
+    SCOPED_TRACE("seed " + std::to_string(seed));
+    std::mt19937 random(seed);
+    const auto below = [&](std::size_t bound) { return static_cast<std::size_t>(random() % bound); };
+    makeOutbox(seed % 2 == 0 ? 2000 : 5000);
+    const auto one = session();
+    std::shared_ptr<twr_sender> sender;
+    bool isConnected = false;
+    // What arrives: numbers, and how many losses had been told with each. 0 tells of a loss and nothing else.
+    std::vector<std::pair<std::int64_t, std::uint64_t>> arrived;
+    std::uint64_t told = 0;
+    const auto take = [&](const RpcFrame& frame) {
+      if (frame.method != "sendMessage") return;
+      const ValueMap& message = *frame.arguments[0]->asMap();
+      told += static_cast<std::uint64_t>(message.integer("twreporting_dropped"));
+      arrived.emplace_back(message.integer("n"), told);
+    };
+    std::int64_t number = 0;
+    for (int step = 0; step < 400; ++step) {
+      const std::size_t action = below(20);
+      if (action < 6) {
+        send(*one, ++number);
+      } else if (action < 14) {
+        if (sender == nullptr) sender = outbox->openSender(*one, hasForked, std::size_t{256} << below(3));
+        below(4) == 0 ? pushLarge(*sender, below(300), ++number) : push(*sender, ++number);
+      } else if (action == 14 && sender != nullptr) {
+        outbox->closeSender(*sender);
+        sender = nullptr;
+      } else if (action == 15) {
+        if (isConnected) outbox->disconnected();
+        isConnected = false;
+      } else if (action >= 18) {
+        if (!isConnected) arriving.clear(), outbox->connected();
+        isConnected = true;
+        saySome(below(1000), take);
+      }
+    }
+    if (!isConnected) arriving.clear(), outbox->connected();
+    outbox->destroy(*one, {});
+    while (saySome(1000, take)) {
+    }
+    std::int64_t last = 0;
+    std::uint64_t lostBefore = 0;
+    for (const auto& [at, toldWithIt] : arrived) {
+      if (at == 0) continue;
+      ASSERT_GT(at, last);
+      lostBefore += static_cast<std::uint64_t>(at - last - 1);
+      ASSERT_EQ(toldWithIt, lostBefore) << "with message " << at;
+      last = at;
+    }
+    ASSERT_EQ(told, lostBefore + static_cast<std::uint64_t>(number - last));
+    ASSERT_EQ(told, outbox->messagesDropped());
+  }
 }
 
 TEST_F(ClientOutboxTest, ClosesItsSendersWithASession) {
@@ -562,21 +731,10 @@ TEST_F(ClientOutboxTest, LeadsTheDaemonToWhatWasAskedForHoweverTheConnectionBrea
     std::vector<std::shared_ptr<twr_session>> sessions;
     std::map<std::int64_t, std::vector<std::int64_t>> accepted;
     std::map<twr_session*, std::shared_ptr<twr_sender>> senders;
-    std::string arriving;
     std::int64_t next = 100;
     bool isConnected = false;
     const auto sendSome = [&](std::size_t most) {
-      const std::string bytes(outbox->unsent());
-      const std::size_t count = std::min(most, bytes.size());
-      arriving += bytes.substr(0, count);
-      outbox->sent(count);
-      std::size_t used = 0;
-      for (const RpcFrame& frame : framesOf(arriving)) {
-        daemon.take(frame);
-        used += frame.wireBytes;
-      }
-      arriving.erase(0, used);
-      return !bytes.empty();
+      return saySome(most, [&](const RpcFrame& frame) { daemon.take(frame); });
     };
     const auto connect = [&] {
       daemon.newConnection();

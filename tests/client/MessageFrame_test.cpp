@@ -14,15 +14,15 @@ namespace {
 
 constexpr double kTime = 1763633999.25;
 
-RingMessage messageOf(const twr_payload& payload, std::uint64_t dropped = 0) {
-  return {TWR_CATEGORY_VOLUME,          TWR_TYPE_STATE, kTime, dropped, payload.entries,
-          {payload.bytes, payload.size}};
+RingMessage messageOf(const twr_payload& payload) {
+  return {TWR_CATEGORY_VOLUME, TWR_TYPE_STATE, kTime, 0, payload.entries, {payload.bytes, payload.size}};
 }
 
 std::optional<RpcFrame> framed(const RingMessage& message, std::vector<std::int64_t> reporterIDs = {77},
-                               std::optional<std::uint32_t> identifier = std::nullopt) {
+                               std::optional<std::uint32_t> identifier = std::nullopt,
+                               std::uint64_t dropped = 0) {
   std::string bytes;
-  appendMessageFrame(bytes, identifier, message, reporterIDs);
+  appendMessageFrame(bytes, identifier, message, dropped, reporterIDs);
   return frameOf(bytes);
 }
 
@@ -53,9 +53,9 @@ TEST(MessageFrameTest, IsARequestWithAnIdentifier) {
 
 TEST(MessageFrameTest, AppendsToWhatIsThere) {
   std::string bytes;
-  appendMessageFrame(bytes, std::nullopt, messageOf(TestPayload()), {});
+  appendMessageFrame(bytes, std::nullopt, messageOf(TestPayload()), 0, {});
   const std::string one = bytes;
-  appendMessageFrame(bytes, std::nullopt, messageOf(TestPayload()), {});
+  appendMessageFrame(bytes, std::nullopt, messageOf(TestPayload()), 0, {});
   EXPECT_EQ(bytes, one + one);
 }
 
@@ -73,8 +73,16 @@ TEST(MessageFrameTest, NamesSeveralReporterIdentifiers) {
 }
 
 TEST(MessageFrameTest, CarriesWhatWasDropped) {
-  EXPECT_EQ(payloadOf(framed(messageOf(TestPayload(), 3))),
+  EXPECT_EQ(payloadOf(framed(messageOf(TestPayload()), {77}, std::nullopt, 3)),
             Value(ValueMap{{"twreporting_timestamp", kTime}, {"twreporting_dropped", 3}}));
+}
+
+TEST(MessageFrameTest, TellsWhereThePayloadBegins) {
+  TestPayload payload;
+  twr_put_double(payload.get(), "level", 0.5);
+  std::string bytes = "before";
+  const std::size_t at = appendMessageFrame(bytes, 7, messageOf(payload), 3, {});
+  EXPECT_EQ(bytes.substr(at, payload->size), std::string(payload->bytes, payload->bytes + payload->size));
 }
 
 TEST(MessageFrameTest, LeavesAPayloadsOwnTimestamp) {
@@ -103,14 +111,14 @@ TEST(MessageFrameTest, StampsAPayloadThatSaysTheNameElsewhere) {
 TEST(MessageFrameTest, PassesAProgramsScribblesOn) {
   const std::array<unsigned char, 4> scribbles{0xC1, 0xDF, 0xFF, 0xFF};
   std::string bytes;
-  appendMessageFrame(bytes, std::nullopt, {1, 0, kTime, 0, 1, scribbles}, {});
+  appendMessageFrame(bytes, std::nullopt, {1, 0, kTime, 0, 1, scribbles}, 0, {});
   EXPECT_FALSE(frameOf(bytes));
 
   std::string named("\xB5twreporting_timestamp\xC1", 23);
   bytes.clear();
   appendMessageFrame(
       bytes, std::nullopt,
-      {1, 0, kTime, 0, 1, {reinterpret_cast<const unsigned char*>(named.data()), named.size()}}, {});
+      {1, 0, kTime, 0, 1, {reinterpret_cast<const unsigned char*>(named.data()), named.size()}}, 0, {});
   EXPECT_FALSE(frameOf(bytes));
 }
 
@@ -129,10 +137,10 @@ TEST(MessageFrameTest, FitsAFrameUpToItsLastByte) {
   text.pop_back();
   ASSERT_EQ(twr_put_text(payload.get(), "n", text.c_str()), TWR_OK);
   ASSERT_EQ(payload->size, most);
-  RingMessage message = messageOf(payload, UINT64_MAX);
+  RingMessage message = messageOf(payload);
   message.category = UINT32_MAX;
   message.type = UINT16_MAX;
-  const auto frame = framed(message, {INT64_MIN, INT64_MIN}, UINT32_MAX);
+  const auto frame = framed(message, {INT64_MIN, INT64_MIN}, UINT32_MAX, UINT64_MAX);
   ASSERT_TRUE(frame);
   EXPECT_EQ(payloadOf(frame).asMap()->text("n"), text);
 }

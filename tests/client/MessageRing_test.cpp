@@ -15,6 +15,15 @@
 namespace tonewerk {
 namespace {
 
+// A ring, and what its session has lost.
+struct Losses {
+  LossCount losses;
+};
+class Ring : public Losses, public MessageRing {
+ public:
+  explicit Ring(std::size_t bytes) : MessageRing(bytes, losses) {}
+};
+
 // A payload of one text entry, `size` bytes long in all, told apart by its fill.
 class Text {
  public:
@@ -38,22 +47,21 @@ std::size_t takenBy(std::size_t bytes) {
 }
 
 TEST(MessageRingTest, HasNothingAtFirst) {
-  MessageRing ring(4096);
+  Ring ring(4096);
   EXPECT_FALSE(ring.front());
-  EXPECT_FALSE(ring.unreportedLoss());
   EXPECT_EQ(ring.writtenPosition(), ring.readPosition());
   EXPECT_EQ(ring.dropped(), 0U);
 }
 
 TEST(MessageRingTest, RoundsItsSizeUpToAPowerOfTwo) {
-  EXPECT_EQ(MessageRing(0).capacity(), MessageRing::kLeastBytes);
-  EXPECT_EQ(MessageRing(4096).capacity(), 4096U);
-  EXPECT_EQ(MessageRing(4097).capacity(), 8192U);
-  EXPECT_EQ(MessageRing(SIZE_MAX).capacity(), std::size_t{TWR_MOST_RING_BYTES});
+  EXPECT_EQ(Ring(0).capacity(), MessageRing::kLeastBytes);
+  EXPECT_EQ(Ring(4096).capacity(), 4096U);
+  EXPECT_EQ(Ring(4097).capacity(), 8192U);
+  EXPECT_EQ(Ring(SIZE_MAX).capacity(), std::size_t{TWR_MOST_RING_BYTES});
 }
 
 TEST(MessageRingTest, GivesWhatWasPushedWithTheTimeOfThePush) {
-  MessageRing ring(4096);
+  Ring ring(4096);
   const double before = coarseSeconds();
   ASSERT_EQ(ring.push(TWR_CATEGORY_VOLUME, TWR_TYPE_STATE, Text(10, 'a')), TWR_OK);
   const double after = coarseSeconds();
@@ -62,14 +70,14 @@ TEST(MessageRingTest, GivesWhatWasPushedWithTheTimeOfThePush) {
   EXPECT_EQ(message->category, TWR_CATEGORY_VOLUME);
   EXPECT_EQ(message->type, TWR_TYPE_STATE);
   EXPECT_EQ(message->entries, 1U);
-  EXPECT_EQ(message->dropped, 0U);
+  EXPECT_EQ(message->lostBefore, 0U);
   EXPECT_EQ(textOf(*message), std::string(10, 'a'));
   EXPECT_GE(message->time, before);
   EXPECT_LE(message->time, after);
 }
 
 TEST(MessageRingTest, TakesAPayloadWithoutEntriesAndWithoutMemory) {
-  MessageRing ring(4096);
+  Ring ring(4096);
   twr_payload empty;
   twr_payload_init(&empty, nullptr, 0);
   ASSERT_EQ(ring.push(1, 0, empty), TWR_OK);
@@ -79,7 +87,7 @@ TEST(MessageRingTest, TakesAPayloadWithoutEntriesAndWithoutMemory) {
 }
 
 TEST(MessageRingTest, KeepsTheFrontUntilItIsPopped) {
-  MessageRing ring(4096);
+  Ring ring(4096);
   std::ignore = ring.push(1, 0, Text(5, 'a'));
   std::ignore = ring.push(2, 0, Text(5, 'b'));
   EXPECT_EQ(ring.front()->category, 1U);
@@ -91,7 +99,7 @@ TEST(MessageRingTest, KeepsTheFrontUntilItIsPopped) {
 }
 
 TEST(MessageRingTest, HasReadWhatWasWrittenOnceItIsPopped) {
-  MessageRing ring(4096);
+  Ring ring(4096);
   std::ignore = ring.push(1, 0, Text(5, 'a'));
   const std::uint64_t written = ring.writtenPosition();
   EXPECT_LT(ring.readPosition(), written);
@@ -102,7 +110,7 @@ TEST(MessageRingTest, HasReadWhatWasWrittenOnceItIsPopped) {
 }
 
 TEST(MessageRingTest, TakesAMessageThatFillsItToTheLastByte) {
-  MessageRing ring(256);
+  Ring ring(256);
   const std::size_t most = 256 - MessageRing::kHeaderBytes;
   ASSERT_EQ(ring.push(1, 0, Text(most, 'a')), TWR_OK);
   EXPECT_EQ(ring.push(1, 0, Text(0, 'b')), TWR_FULL);
@@ -112,7 +120,7 @@ TEST(MessageRingTest, TakesAMessageThatFillsItToTheLastByte) {
 }
 
 TEST(MessageRingTest, TakesTheLargestMessageAtAnyPlaceOfTheRing) {
-  MessageRing ring(256);
+  Ring ring(256);
   const std::size_t most = 256 - MessageRing::kHeaderBytes;
   for (std::size_t shift = 0; shift < 256; shift += MessageRing::kAlignmentBytes) {
     ASSERT_EQ(ring.push(7, 3, Text(most, static_cast<char>(shift))), TWR_OK);
@@ -125,19 +133,19 @@ TEST(MessageRingTest, TakesTheLargestMessageAtAnyPlaceOfTheRing) {
 }
 
 TEST(MessageRingTest, RefusesForEverWhatCanNeverFit) {
-  MessageRing ring(256);
+  Ring ring(256);
   EXPECT_EQ(ring.push(1, 0, Text(256 - MessageRing::kHeaderBytes + 1, 'a')), TWR_TOO_LARGE);
   EXPECT_EQ(ring.dropped(), 1U);
 }
 
 TEST(MessageRingTest, RefusesWhatNoFrameCanHold) {
-  MessageRing ring(TWR_MOST_RING_BYTES);
+  Ring ring(TWR_MOST_RING_BYTES);
   EXPECT_EQ(ring.push(1, 0, Text(kMostFrameBytes, 'a')), TWR_TOO_LARGE);
   EXPECT_EQ(ring.push(1, 0, Text(kMostFrameBytes - 1024, 'a')), TWR_OK);
 }
 
 TEST(MessageRingTest, RefusesAPayloadWithAProblemByThatAndCountsIt) {
-  MessageRing ring(4096);
+  Ring ring(4096);
   std::vector<unsigned char> memory(4);
   twr_payload payload;
   twr_payload_init(&payload, memory.data(), memory.size());
@@ -150,53 +158,32 @@ TEST(MessageRingTest, RefusesAPayloadWithAProblemByThatAndCountsIt) {
   EXPECT_EQ(ring.dropped(), 2U);
 }
 
-TEST(MessageRingTest, CarriesTheNumberOfDroppedMessagesWithTheNextOneTaken) {
-  MessageRing ring(64);
+TEST(MessageRingTest, CarriesWithAMessageHowManyHadBeenLostBeforeIt) {
+  Ring ring(64);
   ASSERT_EQ(ring.push(1, 0, Text(0, 'a')), TWR_OK);
   ASSERT_EQ(ring.push(2, 0, Text(0, 'b')), TWR_OK);
   EXPECT_EQ(ring.push(3, 0, Text(0, 'c')), TWR_FULL);
   EXPECT_EQ(ring.push(4, 0, Text(0, 'd')), TWR_FULL);
-  EXPECT_EQ(ring.front()->dropped, 0U);
+  EXPECT_EQ(ring.front()->lostBefore, 0U);
   ring.pop();
   ASSERT_EQ(ring.push(5, 0, Text(0, 'e')), TWR_OK);
-  EXPECT_EQ(ring.front()->dropped, 0U);  // taken before the loss
+  EXPECT_EQ(ring.front()->lostBefore, 0U);  // taken before the loss
   ring.pop();
   EXPECT_EQ(ring.front()->category, 5U);
-  EXPECT_EQ(ring.front()->dropped, 2U);
+  EXPECT_EQ(ring.front()->lostBefore, 2U);
   ring.pop();
-  ASSERT_EQ(ring.push(6, 0, Text(0, 'f')), TWR_OK);
-  EXPECT_EQ(ring.front()->dropped, 0U);  // said once
   EXPECT_EQ(ring.dropped(), 2U);
 }
 
-TEST(MessageRingTest, TellsALossOnceThatNoMessageCarries) {
-  MessageRing ring(64);
-  std::ignore = ring.push(1, 0, Text(32, 'a'));
-  EXPECT_EQ(ring.push(2, 0, Text(0, 'b')), TWR_FULL);
-  EXPECT_EQ(ring.push(TWR_CATEGORY_IO, 5, Text(0, 'c')), TWR_FULL);
-  ASSERT_TRUE(ring.front());
-  ring.pop();
-  const std::optional<RingMessage> loss = ring.unreportedLoss();
-  ASSERT_TRUE(loss);
-  EXPECT_EQ(loss->category, TWR_CATEGORY_IO);
-  EXPECT_EQ(loss->type, TWR_TYPE_UNKNOWN);
-  EXPECT_EQ(loss->dropped, 2U);
-  EXPECT_EQ(loss->entries, 0U);
-  EXPECT_TRUE(loss->bytes.empty());
-  EXPECT_NEAR(loss->time, coarseSeconds(), 60);
-  EXPECT_FALSE(ring.unreportedLoss());
-}
-
-TEST(MessageRingTest, HasNoUnreportedLossWhenAMessageCarriesIt) {
-  MessageRing ring(64);
-  std::ignore = ring.push(1, 0, Text(32, 'a'));
-  EXPECT_EQ(ring.push(2, 0, Text(0, 'b')), TWR_FULL);
-  ASSERT_TRUE(ring.front());
-  ring.pop();
-  ASSERT_EQ(ring.push(3, 0, Text(0, 'c')), TWR_OK);
-  EXPECT_EQ(ring.front()->dropped, 1U);
-  ring.pop();
-  EXPECT_FALSE(ring.unreportedLoss());
+TEST(MessageRingTest, CountsItsLossesAsTheSessionsWhichHasOthers) {
+  Ring ring(64);
+  ring.losses.add(TWR_CATEGORY_VOLUME);
+  ASSERT_EQ(ring.push(1, 0, Text(32, 'a')), TWR_OK);
+  EXPECT_EQ(ring.front()->lostBefore, 1U);
+  EXPECT_EQ(ring.push(TWR_CATEGORY_IO, 5, Text(0, 'b')), TWR_FULL);
+  EXPECT_EQ(ring.losses.count(), 2U);
+  EXPECT_EQ(ring.losses.lastCategory(), TWR_CATEGORY_IO);
+  EXPECT_EQ(ring.dropped(), 1U);
 }
 
 // What a ring of messages is, said with a queue of them.
@@ -217,7 +204,6 @@ struct Model {
     }
     used += needed;
     messages.push_back({category, text, dropped});
-    dropped = 0;
     return TWR_OK;
   }
 
@@ -234,7 +220,7 @@ struct Model {
 
 RC_GTEST_PROP(MessageRingTest, DoesWhatAQueueWithALimitDoes, ()) {
   const std::size_t capacity = std::size_t{64} << *rc::gen::inRange<unsigned>(0, 5);
-  MessageRing ring(capacity);
+  Ring ring(capacity);
   Model model(capacity);
   // Positive: a push of a text so long; else a pop.
   const auto steps = *rc::gen::container<std::vector<int>>(rc::gen::weightedOneOf<int>(
@@ -252,7 +238,7 @@ RC_GTEST_PROP(MessageRingTest, DoesWhatAQueueWithALimitDoes, ()) {
     RC_ASSERT(front.has_value() == !model.messages.empty());
     if (!front) continue;
     RC_ASSERT(front->category == model.messages.front().category);
-    RC_ASSERT(front->dropped == model.messages.front().dropped);
+    RC_ASSERT(front->lostBefore == model.messages.front().dropped);
     RC_ASSERT(textOf(*front) == model.messages.front().text);
     ring.pop();
     model.pop();
@@ -262,7 +248,7 @@ RC_GTEST_PROP(MessageRingTest, DoesWhatAQueueWithALimitDoes, ()) {
 
 TEST(MessageRingTest, LosesAndMixesNothingBetweenTwoThreads) {
   constexpr std::uint32_t kMessages = 20'000;
-  MessageRing ring(512);  // small, so that it runs full and wraps all the time
+  Ring ring(512);  // small, so that it runs full and wraps all the time
   std::atomic<bool> isDone{false};
   std::thread producer([&] {
     for (std::uint32_t number = 0; number < kMessages; ++number) {
@@ -271,14 +257,14 @@ TEST(MessageRingTest, LosesAndMixesNothingBetweenTwoThreads) {
     isDone = true;
   });
 
-  std::uint64_t next = 0;
+  std::uint64_t taken = 0;
   const auto take = [&] {
     const std::optional<RingMessage> message = ring.front();
     if (!message) return false;
-    // What was dropped since the message before is exactly what is missing between the two.
-    EXPECT_EQ(message->category, next + message->dropped);
+    // What was taken and what was lost before is all there was before.
+    EXPECT_EQ(message->category, taken + message->lostBefore);
     EXPECT_EQ(textOf(*message), std::string(message->category % 97, static_cast<char>(message->category)));
-    next = std::uint64_t{message->category} + 1;
+    ++taken;
     ring.pop();
     return true;
   };
@@ -286,8 +272,7 @@ TEST(MessageRingTest, LosesAndMixesNothingBetweenTwoThreads) {
   producer.join();
   while (take()) {
   }
-  if (const std::optional<RingMessage> loss = ring.unreportedLoss()) next += loss->dropped;
-  EXPECT_EQ(next, kMessages);
+  EXPECT_EQ(taken + ring.losses.count(), kMessages);
 }
 
 }  // namespace

@@ -10,8 +10,10 @@ class OutgoingBatchTest : public testing::Test {
  protected:
   void add(const std::string& frame, std::uint32_t identifier,
            OutgoingFrame::Origin origin = OutgoingFrame::Origin::kQueue) {
-    batch.bytes() += frame;
     OutgoingFrame added;
+    added.bodyAt = batch.bytes().size() + 2;
+    added.bodyBytes = frame.size() < 2 ? 0 : frame.size() - 2;
+    batch.bytes() += frame;
     added.identifier = identifier;
     added.origin = origin;
     batch.add(std::move(added));

@@ -19,7 +19,8 @@ namespace {
 // What the daemon reads of a message with this payload; an empty map for anything wrong.
 ValueMap readBack(const twr_payload& payload) {
   std::string bytes;
-  appendMessageFrame(bytes, std::nullopt, {1, 0, 0, 0, payload.entries, {payload.bytes, payload.size}}, {});
+  appendMessageFrame(bytes, std::nullopt, {1, 0, 0, 0, payload.entries, {payload.bytes, payload.size}}, 0,
+                     {});
   std::optional<RpcFrame> frame = frameOf(bytes);
   if (!frame || frame->refused || frame->arguments.size() != 4 || !frame->arguments[0]->asMap()) return {};
   ValueMap map = *frame->arguments[0]->asMap();

@@ -63,7 +63,7 @@ class ReportingHppTest : public testing::Test {
 ValueMap readBack(const reporting::AnyPayload& payload) {
   std::string bytes;
   const twr_payload& raw = *payload.get();
-  appendMessageFrame(bytes, std::nullopt, {1, 0, 0, 0, raw.entries, {raw.bytes, raw.size}}, {});
+  appendMessageFrame(bytes, std::nullopt, {1, 0, 0, 0, raw.entries, {raw.bytes, raw.size}}, 0, {});
   const std::optional<RpcFrame> frame = frameOf(bytes);
   if (!frame || !frame->arguments[0]->asMap()) return {};
   ValueMap map = *frame->arguments[0]->asMap();
