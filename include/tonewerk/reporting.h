@@ -64,8 +64,9 @@ typedef enum twr_status {
   TWR_NOT_CONNECTED = 5, /* no daemon, or the connection ended before the answer came */
   TWR_REFUSED = 6,       /* the daemon's answer is an error; twr_answer says which */
   TWR_TIMED_OUT = 7,
-  TWR_FORKED = 8,    /* the object belongs to the parent process */
-  TWR_WOULD_WAIT = 9 /* a waiting function was called inside a callback */
+  TWR_FORKED = 8,     /* the object belongs to the parent process */
+  TWR_WOULD_WAIT = 9, /* a waiting function was called inside a callback */
+  TWR_DESTROYED = 10  /* the client was destroyed before the answer came */
 } twr_status;
 
 /* In English words, for logs; never NULL. */
@@ -131,7 +132,7 @@ TWR_API twr_status twr_close(twr_payload* payload);
 
 /* Valid during the callback. Later versions may add members at the end. */
 typedef struct twr_answer {
-  twr_status status; /* TWR_OK, TWR_REFUSED, TWR_NOT_CONNECTED, TWR_FORKED never */
+  twr_status status; /* TWR_OK, TWR_REFUSED, TWR_NOT_CONNECTED or TWR_DESTROYED */
   /* Of TWR_REFUSED: the daemon's error; else "", 0, "". */
   const char* error_domain;
   int64_t error_code;
@@ -150,10 +151,10 @@ typedef struct twr_answer {
 
 /*
  * Called once for a request that was taken (TWR_OK), on the client's background thread, in the order in which
- * the daemon completes requests; with TWR_NOT_CONNECTED when the connection ended before, or the client was
- * destroyed: whether the request was carried out is then not known. twr_client_flush() does not wait for it.
- * May call anything here but what waits. NULL where no answer is wanted: the request is then sent
- * as one that has none, which costs both sides less.
+ * the daemon completes requests; with TWR_NOT_CONNECTED when there was no connection or it ended before, with
+ * TWR_DESTROYED when the client did: whether the request was carried out is then not known.
+ * twr_client_flush() does not wait for it, twr_client_destroy() does. May call anything here but what waits.
+ * NULL where no answer is wanted: the request is then sent as one that has none, which costs both sides less.
  */
 typedef void (*twr_reply)(void* context, const twr_answer* answer);
 
@@ -187,9 +188,13 @@ typedef struct twr_client_options {
 TWR_API twr_client* twr_client_create(const twr_client_options* options);
 
 /*
- * Waits up to `timeout_ms` until what is queued has gone out and the daemon has closed its end, then drops
- * the rest; without a daemon it does not wait. The client's sessions and senders are destroyed with it; the
- * daemon stops and reports started ones. Nothing is called any more once it has returned.
+ * Waits up to `timeout_ms` until what is queued has gone out, the daemon has answered those who wait for it,
+ * and has closed its end, then drops the rest; without a daemon it does not wait. The client's sessions and
+ * senders are destroyed with it; the daemon stops and reports started ones. Nothing is called any more once
+ * it has returned.
+ *
+ * Not waited for are the stop of sessions that are still started, and answers to twr_client_request(), which
+ * the daemon may hold back: those are told TWR_DESTROYED.
  *
  * Inside one of the client's own callbacks it does not wait but leaves that to the background thread: pending
  * replies are still called, state_changed is not. The memory is freed by a later twr_client_create() or
@@ -272,7 +277,7 @@ TWR_API twr_status twr_session_set_configuration(twr_session* session, const twr
                                                  twr_reply reply, void* context);
 /*
  * `stopped` is called when the session stops, by a stop, a change of its type or its end; for a session that
- * is started when the client ends, with TWR_NOT_CONNECTED.
+ * is started when the client ends, with TWR_DESTROYED (or TWR_NOT_CONNECTED, without a daemon).
  */
 TWR_API twr_status twr_session_start(twr_session* session, twr_reply stopped, void* context);
 /*

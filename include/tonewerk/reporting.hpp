@@ -50,7 +50,8 @@ enum class Status {
   kRefused = TWR_REFUSED,
   kTimedOut = TWR_TIMED_OUT,
   kForked = TWR_FORKED,
-  kWouldWait = TWR_WOULD_WAIT
+  kWouldWait = TWR_WOULD_WAIT,
+  kDestroyed = TWR_DESTROYED
 };
 
 enum class State {
@@ -381,7 +382,8 @@ class Client {
   explicit Client(ClientOptions options) noexcept { open(std::move(options)); }
   Client(Client&&) noexcept = default;
   Client& operator=(Client&&) noexcept = default;
-  // With the last session gone, too: waits up to the close time-out until what is queued has gone out.
+  // With the last session gone, too: waits up to the close time-out until what is queued has gone out and
+  // those who wait for an answer have it.
   ~Client() = default;
 
   explicit operator bool() const noexcept { return get() != nullptr; }

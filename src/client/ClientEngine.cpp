@@ -206,13 +206,14 @@ bool ClientEngine::isDone() const {
 }
 
 void ClientEngine::finish(Lock& lock) {
+  const bool isLetGo = socket_.isOpen();
   socket_.close();
   if (isAbandoned_) {
     setState(TWR_STATE_ENDED);
     deliveries_.clear();
     return;
   }
-  outbox_.end();
+  outbox_.end(isLetGo ? TWR_DESTROYED : whyUnanswered());
   state_ = TWR_STATE_ENDED;
   for (const std::shared_ptr<Waiter>& waiter : std::exchange(connectWaiters_, {}))
     waiter->finish(TWR_NOT_CONNECTED);
@@ -270,7 +271,7 @@ void ClientEngine::connectionLost(int error) {
   socket_.close();
   isReadable_ = false;
   awaitsRoom_ = false;
-  outbox_.disconnected();
+  outbox_.disconnected(whyUnanswered());
   if (hasAnswered_ || Clock::now() - connectedAt_ >= settings_.settledTime) backoff_.reset();
   waitBeforeNextAttempt(error);
 }
@@ -278,7 +279,7 @@ void ClientEngine::connectionLost(int error) {
 void ClientEngine::waitBeforeNextAttempt(int error) {
   lastError_ = error;
   if (settings_.isOnce) {
-    outbox_.end();
+    outbox_.end(whyUnanswered());
     setState(TWR_STATE_ENDED);
     return;
   }
@@ -296,6 +297,8 @@ void ClientEngine::transmit(Lock& lock) {
     if (bytes.empty()) {
       outbox_.sent(0);
       if (!isEnding_ || !outbox_.isEmpty()) return;
+      // The daemon answers nothing to who says no more; and who is answered may have more to say.
+      if (outbox_.awaitsAnswers() || !deliveries_.empty()) return;
       hasEndedSending_ = true;
       socket_.endSending();
       return;

@@ -112,6 +112,8 @@ class ClientEngine {
   void receive(Lock& lock);
   bool decode(std::string_view bytes);
   void connectionLost(int error);
+  // Why answers that are still to come will not.
+  twr_status whyUnanswered() const { return hasEndedSending_ ? TWR_DESTROYED : TWR_NOT_CONNECTED; }
   void waitBeforeNextAttempt(int error);
   // False when there was nothing to call.
   bool deliver(Lock& lock);

@@ -372,12 +372,12 @@ void ClientOutbox::answered(const RpcFrame& response) {
   deliver(entry->reply, answer);
 }
 
-void ClientOutbox::disconnected() {
+void ClientOutbox::disconnected(twr_status why) {
   isConnected_ = false;
   toRecreate_.clear();
   std::vector<OutgoingFrame> frames = batch_.takeBack();
   for (auto frame = frames.rbegin(); frame != frames.rend(); ++frame) takeBack(std::move(*frame));
-  const auto lost = std::make_shared<DecodedAnswer>(TWR_NOT_CONNECTED);
+  const auto lost = std::make_shared<DecodedAnswer>(why);
   for (const ReplyTable::Entry& entry : replies_.takeAll()) {
     deliver(entry.reply, lost);
     // A start's stay: the session is started again. Only what should have ended a run leaves it in doubt.
@@ -422,10 +422,10 @@ void ClientOutbox::failBarriers(twr_status status) {
   }
 }
 
-void ClientOutbox::end() {
-  disconnected();
+void ClientOutbox::end(twr_status why) {
+  disconnected(why);
   hasEnded_ = true;
-  const auto lost = std::make_shared<DecodedAnswer>(TWR_NOT_CONNECTED);
+  const auto lost = std::make_shared<DecodedAnswer>(why);
   for (Command& command : queue_.takeAll()) {
     if (command.kind == Command::Kind::kMessage) ++dropped_;
     if (command.waiter != nullptr) command.waiter->finish(TWR_NOT_CONNECTED);

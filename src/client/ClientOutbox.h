@@ -75,12 +75,15 @@ class ClientOutbox {
   // Also with 0, after unsent() was empty.
   void sent(std::size_t bytes);
   void answered(const RpcFrame& response);
-  void disconnected();
+  // Those who wait for an answer that was still to come are told `why`.
+  void disconnected(twr_status why = TWR_NOT_CONNECTED);
   void failBarriers(twr_status status);
-  // For good. Everybody who waits is told TWR_NOT_CONNECTED.
-  void end();
+  // For good. Everybody who waits for an answer is told `why`.
+  void end(twr_status why = TWR_NOT_CONNECTED);
 
   bool isEmpty() const { return queue_.empty() && batch_.empty() && toRecreate_.empty() && !hasRingData(); }
+  // The daemon is to answer something, and will as soon as it can.
+  bool awaitsAnswers() const { return replies_.hasAwaited(); }
   bool hasSenders() const { return !senders_.empty(); }
   std::size_t queuedBytes() const { return queue_.bytes(); }
   std::uint64_t messagesSent() const { return messagesSent_; }

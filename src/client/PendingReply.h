@@ -15,7 +15,8 @@ struct PendingReply {
   twr_reply function = nullptr;
   void* context = nullptr;
   AnswerKind kind = AnswerKind::kPlain;
-  bool isStart = false;  // waits for a session's stop
+  bool isStart = false;    // waits for a session's stop
+  bool mayBeHeld = false;  // by the daemon, for as long as it likes: the end does not wait for it
 
   explicit operator bool() const { return function != nullptr; }
 };

@@ -32,4 +32,10 @@ std::vector<ReplyTable::Entry> ReplyTable::takeAll() {
   return all;
 }
 
+bool ReplyTable::hasAwaited() const {
+  return std::any_of(entries_.begin(), entries_.end(), [](const auto& entry) {
+    return !entry.second.isStart && !entry.second.reply.mayBeHeld;
+  });
+}
+
 }  // namespace tonewerk

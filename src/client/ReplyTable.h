@@ -30,6 +30,8 @@ class ReplyTable {
   // In the order of the requests. A new connection begins anew.
   std::vector<Entry> takeAll();
 
+  // Somebody waits for an answer that the daemon gives as soon as it can.
+  bool hasAwaited() const;
   std::size_t size() const { return entries_.size(); }
 
  private:

@@ -148,6 +148,8 @@ const char* twr_status_text(twr_status status) {
       return "the object belongs to the parent process";
     case TWR_WOULD_WAIT:
       return "cannot wait inside a callback";
+    case TWR_DESTROYED:
+      return "the client was destroyed before the answer came";
   }
   return "unknown status";
 }
@@ -233,7 +235,9 @@ twr_status twr_client_request(twr_client* client, const char* method, const twr_
     appendRequestBody(body, method, parameters);
     if (body.size() + kFrameHeadBytes > kMostFrameBytes) return TWR_TOO_LARGE;
     return client->engine.request([&](ClientOutbox& outbox) {
-      return outbox.request(std::move(body), {reply, context});
+      PendingReply pending{reply, context};
+      pending.mayBeHeld = true;  // who knows what method that is
+      return outbox.request(std::move(body), pending);
     });
   });
 }

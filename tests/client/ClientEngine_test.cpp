@@ -312,11 +312,57 @@ TEST_F(ClientEngineTest, HandsOutAnswersUntilTheDaemonHasClosedItsEnd) {
   connection->next();
   const RpcFrame message = connection->next();
   std::thread destroyer([&] { destroyClient(); });
-  EXPECT_TRUE(connection->waitForEnd());
   connection->answer(message.identifier, std::nullopt);
+  EXPECT_TRUE(connection->waitForEnd());
   connection.reset();
   destroyer.join();
-  EXPECT_THAT(log.rest(), ElementsAre("send: done", "stopped: not connected to the daemon"));
+  EXPECT_THAT(log.rest(),
+              ElementsAre("send: done", "stopped: the client was destroyed before the answer came"));
+}
+
+// A daemon answers nothing to who has ended its half, so that is done last.
+TEST_F(ClientEngineTest, IsDestroyedWhenEverybodyWhoWaitsHasBeenAnswered) {
+  auto connection = connectWithSession();
+  twr_session_start(session, AnswerLog::note, log.as("stopped"));
+  twr_session_stop(session, AnswerLog::note, log.as("stop"));
+  send(1, AnswerLog::note, log.as("send", [&](const twr_answer&) { send(2); }));
+  std::thread destroyer([&] { destroyClient(); });
+  const std::uint32_t start = connection->next().identifier;
+  const std::uint32_t stop = connection->next().identifier;
+  const std::uint32_t message = connection->next().identifier;
+  connection->answer(start, Value(true));
+  connection->answer(stop, Value(true));
+  EXPECT_EQ(log.next(), "stopped: done");
+  EXPECT_EQ(log.next(), "stop: done");
+  connection->answer(message, std::nullopt);
+  // It can still be said what the last answer leads to.
+  EXPECT_EQ(connection->nextText(), ClientTest::message(2));
+  EXPECT_TRUE(connection->waitForEnd());
+  connection.reset();
+  destroyer.join();
+  EXPECT_THAT(log.rest(), ElementsAre("send: done"));
+}
+
+TEST_F(ClientEngineTest, IsDestroyedWithoutAnswersThatADaemonMayHoldBack) {
+  auto connection = connectWithSession();
+  twr_client_request(client, "watch.nextMessages", nullptr, AnswerLog::note, log.as("watch"));
+  std::thread destroyer([&] { destroyClient(); });
+  EXPECT_EQ(connection->nextText(), "watch.nextMessages ?");
+  EXPECT_TRUE(connection->waitForEnd());
+  connection.reset();
+  destroyer.join();
+  EXPECT_THAT(log.rest(), ElementsAre("watch: the client was destroyed before the answer came"));
+}
+
+TEST_F(ClientEngineTest, SaysThatTheConnectionBrokeWhereItDidBeforeTheAnswer) {
+  auto connection = connectWithSession();
+  send(1, AnswerLog::note, log.as("send"));
+  connection->next();
+  daemon.reset();
+  std::thread destroyer([&] { destroyClient(); });
+  connection.reset();
+  destroyer.join();
+  EXPECT_THAT(log.rest(), ElementsAre("send: not connected to the daemon"));
 }
 
 TEST_F(ClientEngineTest, DropsTheRestWhenTheTimeIsUp) {
@@ -324,7 +370,7 @@ TEST_F(ClientEngineTest, DropsTheRestWhenTheTimeIsUp) {
   send(1, AnswerLog::note, log.as("send"));
   connection->next();
   destroyClient(1);
-  EXPECT_THAT(log.rest(), ElementsAre("send: not connected to the daemon"));
+  EXPECT_THAT(log.rest(), ElementsAre("send: the client was destroyed before the answer came"));
   EXPECT_TRUE(connection->waitForEnd());
 }
 

@@ -186,7 +186,7 @@ TEST_F(ReportingHppTest, TellsWhoStillWaitsWhenTheClientGoes) {
   }
   const std::optional<Answer> answer = stopped.get();
   ASSERT_TRUE(answer);
-  EXPECT_EQ(answer->status, Status::kNotConnected);
+  EXPECT_EQ(answer->status, Status::kDestroyed);
 }
 
 TEST_F(ReportingHppTest, ASessionAndASenderOutliveWhatTheyWereMadeOf) {

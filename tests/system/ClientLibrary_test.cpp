@@ -199,6 +199,39 @@ TEST_F(ClientLibraryTest, IsToldOfARunsEndHoweverItEnds) {
   EXPECT_EQ(byDestroy.wait(), TWR_OK);
 }
 
+// A flush waits for no answer; the end does, as the daemon answers nobody who has hung up.
+TEST_F(ClientLibraryTest, IsAnsweredBeforeItIsDestroyed) {
+  ASSERT_TRUE(daemon.start());
+  makeSession();
+  OneAnswer stopped;
+  OneAnswer sent;
+  OneAnswer destroyed;
+  OneAnswer asked;
+  twr_session_start(session, OneAnswer::take, &stopped);
+  TestPayload payload;
+  for (int at = 0; at < 3; ++at)
+    twr_session_send(session, TWR_CATEGORY_PLAYBACK, TWR_TYPE_ACTIVATE, payload.get(), nullptr, nullptr);
+  twr_session_send(session, TWR_CATEGORY_PLAYBACK, TWR_TYPE_START, payload.get(), OneAnswer::take, &sent);
+  twr_session_destroy(session, OneAnswer::take, &destroyed);
+  twr_client_get_all_reporters(client, OneAnswer::take, &asked);
+  EXPECT_EQ(twr_client_flush(client, kPatienceMs), TWR_OK);
+  twr_client_destroy(std::exchange(client, nullptr), kPatienceMs);
+  for (OneAnswer* answer : {&stopped, &sent, &destroyed, &asked}) {
+    ASSERT_TRUE(answer->isThere());
+    EXPECT_EQ(answer->wait(), TWR_OK);
+  }
+}
+
+TEST_F(ClientLibraryTest, SaysThatASessionWasStillStartedAtItsEnd) {
+  ASSERT_TRUE(daemon.start());
+  makeSession();
+  OneAnswer stopped;
+  twr_session_start(session, OneAnswer::take, &stopped);
+  twr_client_destroy(std::exchange(client, nullptr), kPatienceMs);
+  ASSERT_TRUE(stopped.isThere());
+  EXPECT_EQ(stopped.wait(), TWR_DESTROYED);
+}
+
 TEST_F(ClientLibraryTest, LeavesItsSessionsToTheDaemonToReport) {
   ASSERT_TRUE(daemon.start());
   makeSession();

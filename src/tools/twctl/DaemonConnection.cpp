@@ -77,7 +77,7 @@ class DaemonConnection::Inbox {
 
   void put(AnswerHandler handler, const twr_answer& answer) {
     // Who is connected no more gets no answer; that the connection is gone is told by itself.
-    if (answer.status == TWR_NOT_CONNECTED) return;
+    if (answer.status != TWR_OK && answer.status != TWR_REFUSED) return;
     Answer read;
     if (answer.status == TWR_REFUSED) {
       read.error = ReplyError{answer.error_domain, answer.error_code, answer.error_message};
