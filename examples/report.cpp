@@ -1,30 +1,41 @@
 // SPDX-License-Identifier: Apache-2.0
 // A session with an audio thread: c++ report.cpp $(pkg-config --cflags --libs twreporting) -pthread
 #include <chrono>
-#include <cstdio>
+#include <cstdlib>
 #include <functional>
+#include <iostream>
 #include <thread>
 #include <tonewerk/reporting.hpp>
 
 namespace tr = tonewerk::reporting;
 
-// A real-time thread: nothing here locks, allocates or calls the system.
+// A real-time thread: what reports here neither locks, allocates nor waits.
 static void play(tr::Sender& sender) {
-  for (int cycle = 0; cycle < 4; ++cycle) {
-    tr::Payload<128> payload;
-    payload.put("cycle", cycle).put("load", 0.25 * cycle);
-    sender.send(tr::Category::kPerformance, tr::Type::kState, payload);
+  for (int cycle = 0; cycle <= 4; ++cycle) {  // the last one stops
+    tr::Payload<256> payload;
+    payload.put("session_output_running", cycle < 4).put("QMSessionVolume", 0.5);
+    payload.put("active_devices", "Speaker").put("cycle", cycle);
+    sender.send(tr::Category::kPlayback, tr::Type::kState, payload);
+    if (cycle < 4) std::this_thread::sleep_for(std::chrono::milliseconds(250));  // the device plays
   }
 }
-int main() {
+static tr::Status report() {
   tr::Client client;
   {
     tr::Session session(client);
+    tr::Payload<128> names;
     session.setServiceType(tr::Service::kLongFormAudio);
-    session.start([](const tr::Answer& stopped) { std::printf("stopped: %s\n", tr::text(stopped.status)); });
+    session.setConfiguration(names.put("HostApplicationDisplayID", "org.example.Report"));
+    session.start([](const tr::Answer& end) { std::cout << "stopped: " << tr::text(end.status) << "\n"; });
     tr::Sender sender(session);
     std::thread audio(play, std::ref(sender));
     audio.join();
   }  // the session stops here, and the daemon makes its reports
-  std::printf("report: %s\n", tr::text(client.flush(std::chrono::seconds(2))));
+  return client.flush(std::chrono::seconds(2));
+}
+int main() {
+  const tr::Status status = report();
+  std::cout << "report: " << tr::text(status) << std::endl;
+  if (status != tr::Status::kOk) return 0;
+  return std::system("sleep 1; twctl events --name '*.Volume.Summary' --limit 1") == 0 ? 0 : 1;
 }

@@ -18,7 +18,7 @@
  *   unsigned char memory[128];
  *   twr_payload payload;
  *   twr_payload_init(&payload, memory, sizeof memory);
- *   twr_put_double(&payload, "session_volume", 0.5);
+ *   twr_put_double(&payload, "QMSessionVolume", 0.5);
  *   twr_session_send(session, TWR_CATEGORY_VOLUME, TWR_TYPE_GENERIC, &payload, NULL, NULL);
  *
  *   twr_session_destroy(session, NULL, NULL);

@@ -12,7 +12,7 @@
 //   tr::Sender sender(session);  // for the audio callback
 //
 //   tr::Payload<128> payload;
-//   payload.put("session_volume", 0.5).put("muted", false);
+//   payload.put("QMSessionVolume", 0.5).put("muted", false);
 //   sender.send(tr::Category::kVolume, tr::Type::kGeneric, payload);
 //
 // Objects can be moved and not copied. One whose making failed, or that was moved from, is empty: it converts

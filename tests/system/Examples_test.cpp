@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // The example programs, compiled as strangers compile them, and what becomes of what they say.
+#include <filesystem>
+#include <map>
 #include <string>
 
 #include "system/support/DaemonTest.h"
@@ -13,9 +15,17 @@ namespace {
 using nlohmann::json;
 using ::testing::HasSubstr;
 
+// With twctl where a user has it, and the daemon's store where that looks.
+std::optional<std::string> outputOfExample(const char* program, const DaemonProcess& daemon) {
+  std::map<std::string, std::string> environment = daemon.clientEnvironment();
+  environment["STATE_DIRECTORY"] = daemon.path(DaemonProcess::kState);
+  environment["PATH"] = std::filesystem::path(TONEWERK_TWCTL_PATH).parent_path().string() + ":/usr/bin:/bin";
+  return outputOf({program, {}, environment});
+}
+
 class ExamplesTest : public DaemonTest, public ::testing::WithParamInterface<const char*> {
  protected:
-  std::optional<std::string> run() { return outputOf({GetParam(), {}, daemon.clientEnvironment()}); }
+  std::optional<std::string> run() { return outputOfExample(GetParam(), daemon); }
 };
 
 TEST_P(ExamplesTest, ReportsWhatItsAudioThreadSays) {
@@ -25,26 +35,47 @@ TEST_P(ExamplesTest, ReportsWhatItsAudioThreadSays) {
   EXPECT_THAT(*output, HasSubstr("report: " + std::string(twr_status_text(TWR_OK)) + "\n"));
 
   const RecordedEvents recorded(daemon.storePath());
-  for (const char* name :
-       {"com.orvane.tonewerk.Performance.State", "com.orvane.longformaudio.Performance.State"}) {
+  for (const char* name : {"com.orvane.tonewerk.Playback.State", "com.orvane.longformaudio.Playback.State"}) {
     SCOPED_TRACE(name);
-    ASSERT_TRUE(waitUntil([&] { return recorded.named(name).size() >= 4; }));
+    ASSERT_TRUE(waitUntil([&] { return recorded.named(name).size() >= 5; }));
     const std::vector<json> events = recorded.named(name);
-    ASSERT_EQ(events.size(), 4U);
+    ASSERT_EQ(events.size(), 5U);
     for (std::size_t cycle = 0; cycle < events.size(); ++cycle) {
       EXPECT_EQ(events[cycle].at("cycle"), cycle);
-      EXPECT_EQ(events[cycle].at("load"), 0.25 * static_cast<double>(cycle));
+      EXPECT_EQ(events[cycle].at("session_output_running"), cycle < 4);
+      EXPECT_EQ(events[cycle].at("HostApplicationDisplayID"), "org.example.Report");
       EXPECT_TRUE(events[cycle].contains("twreporting_timestamp"));
       EXPECT_FALSE(events[cycle].contains("twreporting_dropped"));
     }
   }
-  // The session has stopped, or there would be no summary of it.
+  const char* summary = "com.orvane.longformaudio.Volume.Summary";
+  ASSERT_TRUE(waitUntil([&] { return !recorded.named(summary).empty(); }));
+  const json made = recorded.named(summary).front();
+  EXPECT_EQ(made.at("HostApplicationDisplayID"), "org.example.Report");
+  EXPECT_EQ(made.at("QMSessionVolume"), 0.5);
+  EXPECT_EQ(made.at("active_devices"), "Speaker");
+  EXPECT_GE(made.at("play_seconds"), 0.9);
+}
+
+TEST_P(ExamplesTest, PrintsTheVolumeSummaryThatCameOfIt) {
+  ASSERT_TRUE(daemon.start());
+  // A busy machine may take longer to write the store than the program waits for it.
+  std::optional<std::string> output;
   EXPECT_TRUE(waitUntil([&] {
-    for (const std::string& name : recorded.names()) {
-      if (name.find("Summary") != std::string::npos) return true;
-    }
-    return false;
-  }));
+    output = run();
+    return output && output->find(".Volume.Summary") != std::string::npos;
+  })) << output.value_or("");
+  EXPECT_THAT(*output, HasSubstr("\"HostApplicationDisplayID\":\"org.example.Report\""));
+  EXPECT_THAT(*output, HasSubstr("\"QMSessionVolume\":0.5"));
+}
+
+// It asks for the answer to its start, destroys the session, flushes, and destroys the client.
+TEST(ExampleInCxxTest, IsToldThatItsSessionHasStopped) {
+  DaemonProcess daemon;
+  ASSERT_TRUE(daemon.start());
+  const auto output = outputOfExample(TONEWERK_EXAMPLE_CXX, daemon);
+  ASSERT_TRUE(output);
+  EXPECT_THAT(*output, HasSubstr("stopped: done\n"));
 }
 
 TEST_P(ExamplesTest, EndsWellWithoutADaemon) {
