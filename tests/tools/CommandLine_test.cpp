@@ -17,8 +17,7 @@
 #include "support/MemoryLog.h"
 #include "support/MemoryPreferenceStore.h"
 #include "support/TemporaryDirectory.h"
-#include "tools/ScriptedDaemon.h"
-#include "tools/twctl/Commands.h"
+#include "tools/CommandLineTest.h"
 
 namespace tonewerk {
 namespace {
@@ -27,50 +26,6 @@ using testing::HasSubstr;
 using testing::IsEmpty;
 using testing::SizeIs;
 using testing::StartsWith;
-
-// twctl with directories and a socket of its own.
-class CommandLineTest : public testing::Test {
- protected:
-  CommandLineTest() {
-    setenv("TONEWERK_REPORTING_SOCKET", socket_.c_str(), 1);
-    setenv("RUNTIME_DIRECTORY", directory_.path("runtime").c_str(), 1);
-    setenv("STATE_DIRECTORY", directory_.path("state").c_str(), 1);
-    setenv("CONFIGURATION_DIRECTORY", directory_.path("configuration").c_str(), 1);
-  }
-  void TearDown() override {
-    for (const char* name :
-         {"TONEWERK_REPORTING_SOCKET", "RUNTIME_DIRECTORY", "STATE_DIRECTORY", "CONFIGURATION_DIRECTORY"})
-      unsetenv(name);
-  }
-
-  // The exit status; what was printed is in output() and errors().
-  int run(const std::vector<std::string>& arguments) {
-    std::vector<const char*> argv{"twctl"};
-    for (const std::string& argument : arguments) argv.push_back(argument.c_str());
-    out_.str({});
-    err_.str({});
-    Tool tool{out_, err_, json_};
-    return runCommandLine(static_cast<int>(argv.size()), argv.data(), tool);
-  }
-  std::string output() const { return out_.str(); }
-  std::string errors() const { return err_.str(); }
-
-  ScriptedDaemon& daemon() {
-    if (daemon_ == nullptr) daemon_ = std::make_unique<ScriptedDaemon>(socket_);
-    return *daemon_;
-  }
-  std::string write(const std::string& name, const std::string& text) {
-    std::ofstream(directory_.path(name)) << text;
-    return directory_.path(name);
-  }
-
-  TemporaryDirectory directory_;
-  const std::string socket_ = directory_.path("reporting.sock");
-  NlohmannJsonService json_;
-  std::ostringstream out_;
-  std::ostringstream err_;
-  std::unique_ptr<ScriptedDaemon> daemon_;
-};
 
 TEST_F(CommandLineTest, HelpsWithEveryCommand) {
   for (const char* name :
@@ -481,29 +436,6 @@ TEST_F(PowerCommandTest, TotalsKeepToTheFilter) {
             "game             2                 1\n");
 }
 
-TEST_F(CommandLineTest, SetsPreferences) {
-  EXPECT_EQ(run({"defaults", "read", "a.b"}), kRefused);
-  EXPECT_EQ(run({"defaults", "write", "a.b", "list", "[1, \"x\"]"}), kDone);
-  EXPECT_EQ(run({"defaults", "write", "a.b", "text", "some words"}), kDone);
-  EXPECT_EQ(run({"defaults", "write", "a.b", "number", "-5"}), kDone);
-  EXPECT_EQ(run({"defaults", "read", "a.b", "list", "--json"}), kDone);
-  EXPECT_EQ(output(), "{\"key\":\"list\",\"value\":[1,\"x\"]}\n");
-  EXPECT_EQ(run({"defaults", "read", "a.b"}), kDone);
-  EXPECT_THAT(output(), HasSubstr("text    some words\n"));
-  EXPECT_THAT(output(), HasSubstr("number  -5\n"));
-  EXPECT_EQ(run({"defaults", "delete", "a.b", "text"}), kDone);
-  EXPECT_EQ(run({"defaults", "read", "a.b", "text"}), kRefused);
-  EXPECT_EQ(run({"defaults", "delete", "a.b", "text"}), kRefused);
-}
-
-TEST_F(CommandLineTest, DoesNotDeleteWhatIsConfigured) {
-  std::filesystem::create_directories(directory_.path("configuration/preferences"));
-  write("configuration/preferences/a.b.toml", "key = 5\n");
-  EXPECT_EQ(run({"defaults", "delete", "a.b", "key"}), kRefused);
-  EXPECT_THAT(errors(), testing::Not(IsEmpty()));
-  EXPECT_EQ(run({"defaults", "read", "a.b", "key"}), kDone);
-}
-
 TEST_F(CommandLineTest, PostsANotificationAndGetsItsState) {
   EXPECT_EQ(run({"notify", "post", "com.orvane.test", "18446744073709551615"}), kDone);
   EXPECT_THAT(output() + errors(), IsEmpty());
@@ -543,54 +475,6 @@ TEST_F(CommandLineTest, RefusesWhatCannotNameANotification) {
     EXPECT_EQ(errors(), "twctl: \"" + std::string(name) + "\" cannot name a notification\n");
     EXPECT_EQ(run({"notify", "get", name}), kRefused) << name;
   }
-}
-
-class AnnouncedDefaultsTest : public CommandLineTest {
- protected:
-  AnnouncedDefaultsTest() { std::filesystem::create_directory(directory_.path("runtime")); }
-
-  // The names posted since the last call.
-  std::vector<std::string> posted() {
-    std::vector<std::string> names;
-    std::error_code none;
-    const std::filesystem::path notifications = directory_.path("runtime/notifications");
-    for (const auto& entry : std::filesystem::directory_iterator(notifications, none)) {
-      names.push_back(entry.path().filename().string());
-    }
-    std::filesystem::remove_all(notifications);
-    return names;
-  }
-};
-
-TEST_F(AnnouncedDefaultsTest, TellsTheDaemonOfWhatItFollows) {
-  EXPECT_EQ(run({"defaults", "write", "com.orvane.tonewerk", "device_name", "Kitchen"}), kDone);
-  EXPECT_THAT(posted(), testing::ElementsAre("com.orvane.tonewerk.reporting"));
-  EXPECT_EQ(run({"defaults", "delete", "com.orvane.tonewerk", "device_name"}), kDone);
-  EXPECT_THAT(posted(), testing::ElementsAre("com.orvane.tonewerk.reporting"));
-  EXPECT_EQ(run({"defaults", "write", "com.orvane.homedeck", "spatial-audio-accessory-feature", "1"}), kDone);
-  EXPECT_THAT(posted(), testing::ElementsAre("com.orvane.homedeck.spatial-audio-accessory-feature.changed"));
-}
-
-TEST_F(AnnouncedDefaultsTest, TellsNobodyOfWhatNobodyFollowsOrDidNotChange) {
-  EXPECT_EQ(run({"defaults", "write", "com.orvane.homedeck", "device_name", "1"}), kDone);
-  EXPECT_EQ(run({"defaults", "write", "com.orvane.metricon", "device_name", "1"}), kDone);
-  EXPECT_EQ(run({"defaults", "read", "com.orvane.homedeck"}), kDone);
-  EXPECT_EQ(run({"defaults", "delete", "com.orvane.tonewerk", "device_name"}), kRefused);
-  EXPECT_THAT(posted(), IsEmpty());
-}
-
-TEST_F(AnnouncedDefaultsTest, WithoutARuntimeDirectoryThereIsNobodyToTell) {
-  std::filesystem::remove(directory_.path("runtime"));
-  EXPECT_EQ(run({"defaults", "write", "com.orvane.tonewerk", "device_name", "Kitchen"}), kDone);
-  EXPECT_THAT(errors(), IsEmpty());
-  EXPECT_FALSE(std::filesystem::exists(directory_.path("runtime")));
-}
-
-TEST_F(AnnouncedDefaultsTest, AChangeThatCannotBeToldHoldsAndSaysSo) {
-  write("runtime/notifications", "a file in the way");
-  EXPECT_EQ(run({"defaults", "write", "com.orvane.tonewerk", "device_name", "Kitchen"}), kDone);
-  EXPECT_THAT(errors(), HasSubstr("a running daemon is not told of it: com.orvane.tonewerk.reporting: "));
-  EXPECT_EQ(run({"defaults", "read", "com.orvane.tonewerk", "device_name"}), kDone);
 }
 
 }  // namespace
