@@ -39,7 +39,7 @@ TWReportingClientServerInstance::TWReportingClientServerInstance(
 }
 
 TWReportingClientServerInstance::~TWReportingClientServerInstance() {
-  infoLog(category(), "dealloc %i from the server client list", processIdentifier_);
+  logLine(presenceLevel(), category(), "dealloc %i from the server client list", processIdentifier_);
 }
 
 template <typename Body>
@@ -244,6 +244,14 @@ void TWReportingClientServerInstance::killService() {
   if (const Delegate delegate = delegate_.lock()) delegate->endProcess();
 }
 
+void TWReportingClientServerInstance::observe(ServiceRequest request) {
+  isOnlooker_ = true;
+  onWorkQueue(std::move(request), [](auto& self, auto&, const Reply& reply) {
+    debugLog(category(), "client %i looks on", self.processIdentifier_);
+    reply(std::nullopt, true);
+  });
+}
+
 TWReportingClientServerInstance::Session TWReportingClientServerInstance::findReportingSessionForID(
     ReporterID reporterID, bool acrossAllClients) {
   if (Session own = ownSession(reporterID)) return own;
@@ -274,7 +282,8 @@ void TWReportingClientServerInstance::handleConnectionError() {
     }
     self->clientReportingSessionMap_.clear();
     delegate->removeClient(*self);
-    infoLog(category(), "removing %i from the server client list", self->processIdentifier_);
+    logLine(self->presenceLevel(), category(), "removing %i from the server client list",
+            self->processIdentifier_);
   });
 }
 

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <atomic>
 #include <cstddef>
 #include <cstdint>
 #include <map>
@@ -9,6 +10,7 @@
 #include <optional>
 #include <string>
 
+#include "platform/Log.h"
 #include "service/TWReportingServiceProtocol.h"
 #include "session/AudioEvent.h"
 #include "session/KeptBytesBudget.h"
@@ -21,8 +23,8 @@ class TWReportingSession;
 // One connected client process and its sessions: what its connection's requests are made to.
 //
 // Each request is moved onto the work queue, where it runs in the order of arrival; only the kill request
-// acts at once. clientStartDate and clientProcessName may be read and set on any thread, the session map
-// belongs to the work queue.
+// acts at once, and a client is an onlooker at once. clientStartDate and clientProcessName may be read and
+// set on any thread, the session map belongs to the work queue.
 class TWReportingClientServerInstance final
     : public TWReportingServiceProtocol,
       public std::enable_shared_from_this<TWReportingClientServerInstance> {
@@ -53,6 +55,7 @@ class TWReportingClientServerInstance final
   void reporterIDValid(ReporterID reporterID, ServiceRequest request) override;
   void getAllReporters(ServiceRequest request) override;
   void killService() override;
+  void observe(ServiceRequest request) override;
 
   // This client's session of that identifier, else, when asked to, any client's; null when there is none.
   std::shared_ptr<TWReportingSession> findReportingSessionForID(ReporterID reporterID, bool acrossAllClients);
@@ -62,6 +65,9 @@ class TWReportingClientServerInstance final
   void handleConnectionError();
 
   std::int32_t processIdentifier() const { return processIdentifier_; }
+
+  // Whether it has said that it only looks on. Any thread.
+  bool isOnlooker() const { return isOnlooker_; }
 
   // Seconds since 1970; none until the service has registered the client.
   std::optional<double> clientStartDate() const;
@@ -79,6 +85,8 @@ class TWReportingClientServerInstance final
   template <typename Body>
   void onWorkQueue(ServiceRequest request, Body body);
 
+  // Of log lines on its coming and going: nobody wants to read of who only looks.
+  LogLevel presenceLevel() const { return isOnlooker_ ? LogLevel::kDebug : LogLevel::kInfo; }
   Session ownSession(ReporterID reporterID) const;
   Session makeSession(ReporterID reporterID) const;
   void changeServiceType(AudioServiceType serviceType, const Session& session);
@@ -87,6 +95,7 @@ class TWReportingClientServerInstance final
   const std::weak_ptr<TWReportingServiceDelegateProtocol> delegate_;
   const std::shared_ptr<KeptBytesBudget> budget_;
   SessionMap clientReportingSessionMap_;
+  std::atomic<bool> isOnlooker_ = false;
 
   mutable std::mutex mutex_;
   std::optional<double> clientStartDate_;         // guarded by mutex_

@@ -62,8 +62,11 @@ bool TWReportingService::listenerShouldAcceptNewConnection(MessagingConnection& 
             std::move(client), std::make_unique<WatchExport>(processIdentifier, weak_from_this())));
   }
   connection.setInterruptionHandler([weakClient] {
-    infoLog(category(), "interruptionHandler: connection exited");
-    if (const auto client = weakClient.lock()) client->handleConnectionError();
+    const auto client = weakClient.lock();
+    const bool isOnlooker = client != nullptr && client->isOnlooker();
+    logLine(isOnlooker ? LogLevel::kDebug : LogLevel::kInfo, category(),
+            "interruptionHandler: connection exited");
+    if (client != nullptr) client->handleConnectionError();
   });
   connection.setInvalidationHandler(
       [this, processIdentifier, weakClient] { reportClientUptime(processIdentifier, weakClient); });
@@ -82,6 +85,10 @@ void TWReportingService::reportClientUptime(
     std::int32_t processIdentifier, const std::weak_ptr<TWReportingClientServerInstance>& weakClient) {
   const auto client = weakClient.lock();
   if (client != nullptr) client->handleConnectionError();
+  if (client != nullptr && client->isOnlooker()) {
+    debugLog(category(), "onlooker %i has gone", processIdentifier);
+    return;
+  }
   sendClientUptime(processIdentifier, client == nullptr ? std::nullopt : client->clientStartDate(),
                    client == nullptr ? std::nullopt : client->clientProcessName());
 }

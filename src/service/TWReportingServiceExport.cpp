@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "service/TWReportingServiceExport.h"
 
+#include <string>
 #include <utility>
 #include <vector>
 
@@ -22,8 +23,26 @@ enum ServiceMethod : std::size_t {
   kReporterIDValid,
   kGetAllReporters,
   kKillService,
+  kObserve,
   kFirstWatchMethod,
 };
+
+// Whether it changes sessions or the daemon, rather than asks about them.
+bool changesSomething(std::size_t method) {
+  switch (method) {
+    case kCreateReportingSession:
+    case kSetServiceType:
+    case kSetConfiguration:
+    case kStartReportingSessionForID:
+    case kSendMessage:
+    case kStopReportingSessionForID:
+    case kDestroyReportingSession:
+    case kKillService:
+      return true;
+    default:
+      return false;
+  }
+}
 
 // Of a list of reporter identifiers: what some ten clients with all the sessions they may have come to.
 constexpr std::size_t kMostListBytes = std::size_t{512} << 10;
@@ -62,6 +81,7 @@ std::vector<Method> requestSet() {
       {"reporterIDValid", {kReporterID}, {ResultType::kMap, "validity"}},
       {"getAllReporters", {}, {ResultType::kInt64List, "reporterIDs"}, kMostListBytes},
       {"killService", {}, {ResultType::kNever, ""}},
+      {"observe", {}, kSuccess},
   };
 }
 
@@ -81,8 +101,25 @@ const ExportedInterface& TWReportingServiceExport::exportedInterface() {
   return interface;
 }
 
+std::optional<ReplyError> TWReportingServiceExport::takeRole(std::size_t method) {
+  if (method == kObserve) {
+    if (role_ == Role::kClient)
+      return messagingError(kNotPermitted, "not permitted: observe comes before what changes something");
+    role_ = Role::kOnlooker;
+  } else if (changesSomething(method)) {
+    if (role_ == Role::kOnlooker) {
+      return messagingError(kNotPermitted, "not permitted: the connection only looks on since observe, and " +
+                                               std::string(exportedInterface().methods[method].name) +
+                                               " changes something");
+    }
+    role_ = Role::kClient;
+  }
+  return std::nullopt;
+}
+
 void TWReportingServiceExport::handleRequest(std::size_t method, Arguments arguments, Reply reply,
                                              RequestToken token) {
+  if (const std::optional<ReplyError> error = takeRole(method)) return reply(error);
   if (method >= kFirstWatchMethod) {
     return watch_->handleRequest(method - kFirstWatchMethod, std::move(arguments), std::move(reply),
                                  std::move(token));
@@ -121,6 +158,8 @@ void TWReportingServiceExport::handleRequest(std::size_t method, Arguments argum
       return object_->getAllReporters(std::move(request));
     case kKillService:
       return object_->killService();
+    case kObserve:
+      return object_->observe(std::move(request));
     default:
       return;
   }

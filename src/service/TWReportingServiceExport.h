@@ -1,7 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <cstddef>
 #include <memory>
+#include <optional>
 
 #include "platform/ExportedInterface.h"
 #include "service/TWReportingServiceProtocol.h"
@@ -10,6 +12,9 @@ namespace tonewerk {
 
 // Turns a connection's requests, which name methods by place and bring values, into calls of the request set.
 // Requests beyond it, those to see what the daemon does now, go to `watch`.
+//
+// A connection is a client or an onlooker, whichever it is first: an onlooker's requests that change
+// something are refused, and so is a client's request to be an onlooker.
 class TWReportingServiceExport final : public ExportedObject {
  public:
   TWReportingServiceExport(std::shared_ptr<TWReportingServiceProtocol> object,
@@ -21,6 +26,12 @@ class TWReportingServiceExport final : public ExportedObject {
   static const ExportedInterface& exportedInterface();
 
  private:
+  enum class Role { kOpen, kClient, kOnlooker };
+
+  // Takes the role that goes with the method; why it cannot, or none.
+  std::optional<ReplyError> takeRole(std::size_t method);
+
+  Role role_ = Role::kOpen;  // the messaging thread's
   const std::shared_ptr<TWReportingServiceProtocol> object_;
   const std::unique_ptr<ExportedObject> watch_;
 };

@@ -21,8 +21,9 @@ struct ServiceRequest {
   RequestToken token;
 };
 
-// The daemon's request set, as a client's connection makes it. Called on the messaging thread; the answers
-// come from the work queue. An answer is true, never false: unknown sessions are no errors.
+// The daemon's request set, as a client's connection makes it, and the request to be no client but an
+// onlooker. Called on the messaging thread; the answers come from the work queue. An answer is true, never
+// false: unknown sessions are no errors.
 class TWReportingServiceProtocol {
  public:
   using ReporterIDs = std::optional<std::vector<ReporterID>>;
@@ -46,6 +47,8 @@ class TWReportingServiceProtocol {
   virtual void getAllReporters(ServiceRequest request) = 0;
   // Ends the process. Never answered.
   virtual void killService() = 0;
+  // The connection only looks on: it makes and changes nothing, and how long it lasted is not reported.
+  virtual void observe(ServiceRequest request) = 0;
 };
 
 }  // namespace tonewerk

@@ -2,6 +2,9 @@
 #include "service/TWReportingService.h"
 
 #include <gtest/gtest.h>
+#include <string>
+#include <utility>
+#include <vector>
 
 #include "monitor/TWReportingSystemMonitor.h"
 #include "service/TWReportingClientServerInstance.h"
@@ -119,6 +122,69 @@ TEST_F(TWReportingServiceTest, AStartDateInTheFutureIsLoggedAndTheIntervalCounts
               ElementsAre("clientStartDate is in the past. clientpid=11 clientprocessname=player"));
   EXPECT_EQ(test.metricon.eventsNamed("com.orvane.tonewerk.twreportingclientuptime").at(0).number("seconds"),
             100.0);
+}
+
+// A tool that asks for the list of sessions left an event of its own behind, each time.
+TEST_F(TWReportingServiceTest, ReportsNothingOfAnOnlookerAndLogsItsGoingForDebuggingAlone) {
+  test.processes.setName(11, "twctl");
+  auto client = connect(11);
+  EXPECT_EQ(askOnce(*client, "observe", {}), Value(true));
+  EXPECT_EQ(askOnce(*client, "getAllReporters", {}), Value(ValueArray()));
+  test.log.clear();
+  client->disconnect();
+  run();
+  EXPECT_THAT(test.metricon.events(), IsEmpty());
+  EXPECT_THAT(service->getAllClients(), IsEmpty());
+  for (const LogLevel level : {LogLevel::kInfo, LogLevel::kDefault, LogLevel::kError}) {
+    EXPECT_THAT(test.log.textsOf("twrs", level), IsEmpty());
+  }
+  EXPECT_THAT(
+      test.log.textsOf("twrs", LogLevel::kDebug),
+      ElementsAre("interruptionHandler: connection exited", "onlooker 11 has gone",
+                  "removing 11 from the server client list", "dealloc 11 from the server client list"));
+}
+
+TEST_F(TWReportingServiceTest, AnOnlookerMayAskAndChangeNothing) {
+  const auto client = connect(11);
+  start(*client, 77);
+  const auto onlooker = connect(12);
+  EXPECT_EQ(askOnce(*onlooker, "observe", {}), Value(true));
+  EXPECT_EQ(askOnce(*onlooker, "observe", {}), Value(true));
+  const std::vector<std::pair<std::string, Arguments>> changes{
+      {"createReportingSession", {78}},
+      {"setServiceType", {7, 77}},
+      {"setConfiguration", {ValueMap{{"a", 1}}, 77}},
+      {"startReportingSessionForID", {77}},
+      {"sendMessage", {ValueMap{{"a", 1}}, 4, 1, ValueArray{77}}},
+      {"stopReportingSessionForID", {77}},
+      {"destroyReportingSession", {77}},
+      {"killService", {}}};
+  for (const auto& [method, arguments] : changes) {
+    SCOPED_TRACE(method);
+    const auto answers = ask(*onlooker, method, arguments);
+    ASSERT_THAT(answers, SizeIs(1));
+    EXPECT_EQ(answers[0].error,
+              messagingError(4, "not permitted: the connection only looks on since observe, and " + method +
+                                    " changes something"));
+  }
+  EXPECT_EQ(processEnds, 0);
+  EXPECT_THAT(sessionOf(0, 77)->messages(), SizeIs(1));  // of its start
+  EXPECT_EQ(askOnce(*onlooker, "getAllReporters", {}), Value(ValueArray{77}));
+  EXPECT_EQ(askOnce(*onlooker, "reporterIDValid", {77}).asMap()->integer("reporterID"), 77);
+  EXPECT_EQ(askOnce(*onlooker, "watch.sessions", {0}).asMap()->integer("total"), 1);
+}
+
+TEST_F(TWReportingServiceTest, WhoHasChangedSomethingIsAClientForGood) {
+  test.processes.setName(11, "player");
+  auto client = connect(11);
+  EXPECT_EQ(askOnce(*client, "getAllReporters", {}), Value(ValueArray()));
+  create(*client, 77);
+  const auto answers = ask(*client, "observe", {});
+  ASSERT_THAT(answers, SizeIs(1));
+  EXPECT_EQ(answers[0].error,
+            messagingError(4, "not permitted: observe comes before what changes something"));
+  client->disconnect();
+  EXPECT_THAT(test.metricon.eventsNamed("com.orvane.tonewerk.twreportingclientuptime"), SizeIs(1));
 }
 
 TEST_F(TWReportingServiceTest, SaysWhenItGoes) {

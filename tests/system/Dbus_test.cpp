@@ -256,7 +256,9 @@ TEST_F(DbusTest, EveryMethodIsDescribedAndNoneForTheOwnerAlone) {
       method("DestroyReportingSession", session + success) +
       method("ReporterIDValid", session + out("a{sv}", "validity")) +
       method("GetAllReporters", out("ax", "reporterIDs")) +
-      method("KillService", "   <annotation name=\"org.freedesktop.DBus.Method.NoReply\" value=\"true\"/>\n");
+      method("KillService",
+             "   <annotation name=\"org.freedesktop.DBus.Method.NoReply\" value=\"true\"/>\n") +
+      method("Observe", success);
   const auto first = description.find('\n', begin) + 1;
   EXPECT_EQ(description.substr(first, description.find(" </interface>", first) - first), expected);
 }
