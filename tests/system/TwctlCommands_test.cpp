@@ -173,6 +173,35 @@ TEST_F(TwctlTest, AMessageReachesTheSessionsNamedOrElseAllStarted) {
               IsEmpty());
 }
 
+TEST_F(TwctlTest, AMessageForAnIdentifierThatNobodyHasIsSentToNone) {
+  DaemonClient client = connect();
+  client.create(kSession, 7);
+  client.start(kSession);
+  EXPECT_EQ(run({"send", "--id", "77", "--id", "79", "--category", "Playback", "--type", "Start", "n=1"}),
+            kRefused);
+  EXPECT_EQ(errors, "twctl: no session has the identifier 79; the message was sent to none\n");
+  EXPECT_EQ(run({"send", "--id", "77", "--category", "Playback", "--type", "Start", "n=2"}), kDone);
+  const char* sent = "com.orvane.longformaudio.Playback.Start";
+  ASSERT_TRUE(waitForEvents(sent, 1));
+  EXPECT_EQ(RecordedEvents(daemon.storePath()).named(sent).at(0).at("n"), 2);
+}
+
+// Each look at the daemon left an event on how long it had taken.
+TEST_F(TwctlTest, LookingLeavesNoEventBehindAndSendingDoes) {
+  DaemonClient client = connect();
+  client.create(kSession, 7);
+  client.start(kSession);
+  EXPECT_EQ(run({"list"}), kDone);
+  EXPECT_EQ(run({"validate", "77"}), kDone);
+  EXPECT_EQ(run({"top", "--json", "--interval", "0.05"}), kDone);
+  EXPECT_EQ(run({"send", "--category", "Playback", "--type", "Start", "n=1"}), kDone);
+  const char* uptime = "com.orvane.tonewerk.twreportingclientuptime";
+  ASSERT_TRUE(waitForEvents(uptime, 1));  // those of earlier connections come before
+  const std::vector<json> events = RecordedEvents(daemon.storePath()).named(uptime);
+  ASSERT_THAT(events, SizeIs(1));
+  EXPECT_EQ(events[0].at("processName"), "twctl");
+}
+
 TEST_F(TwctlTest, WhatTheHapticsEngineReportsIsInThePowerLog) {
   DaemonClient client = connect();
   client.create(kSession, 3);

@@ -141,16 +141,53 @@ TEST_F(CommandLineTest, RefusesAnIdentifierThatNobodyHas) {
 }
 
 TEST_F(CommandLineTest, SendsAMessageToTheSessionsNamed) {
-  daemon();
+  daemon().setSessions({7, -8});
   EXPECT_EQ(run({"send", "--id", "7", "--id", "-8", "--category", "HAL_Playback", "--type", "Start",
                  "on=true", "n=5", "volume=0.5", "text=a=b"}),
             kDone);
-  ASSERT_THAT(daemon().requests(), SizeIs(1));
-  const Arguments arguments = daemon().requests()[0].arguments;
+  ASSERT_THAT(daemon().requestsFor("sendMessage"), SizeIs(1));
+  const Arguments arguments = daemon().requestsFor("sendMessage")[0].arguments;
   EXPECT_EQ(arguments[0], Value(ValueMap{{"on", true}, {"n", 5}, {"volume", 0.5}, {"text", "a=b"}}));
   EXPECT_EQ(arguments[1], Value(0x20000004));
   EXPECT_EQ(arguments[2], Value(1));
   EXPECT_EQ(arguments[3], Value(ValueArray{7, -8}));
+}
+
+// The daemon passes over identifiers that nobody has, and answers as if all were well.
+TEST_F(CommandLineTest, SendsToNobodyWhenAnIdentifierIsNobodys) {
+  daemon().setSessions({7});
+  EXPECT_EQ(run({"send", "--id", "8", "--category", "4", "--type", "1", "a=1"}), kRefused);
+  EXPECT_EQ(errors(), "twctl: no session has the identifier 8; the message was sent to none\n");
+  EXPECT_EQ(run({"send", "--id", "7", "--id", "8", "--id", "0", "--category", "4", "--type", "1", "a=1"}),
+            kRefused);
+  EXPECT_EQ(errors(), "twctl: no session has the identifier 8, 0; the message was sent to none\n");
+  EXPECT_THAT(daemon().requestsFor("sendMessage"), IsEmpty());
+}
+
+TEST_F(CommandLineTest, WhoOnlyLooksSaysSoAndWhoChangesSomethingDoesNot) {
+  daemon().setSessions({7});
+  daemon().answer("getAllReporters", ValueArray{7});
+  const std::string recording =
+      write("recording.jsonl", R"({"at": 0, "call": "createReportingSession", "params": [7]})");
+  const auto firstRequestOf = [this](const std::vector<std::string>& command) {
+    const std::size_t before = daemon().requests().size();
+    EXPECT_EQ(run(command), kDone) << errors();
+    return daemon().requests().at(before).method;
+  };
+  EXPECT_EQ(firstRequestOf({"list"}), "observe");
+  EXPECT_EQ(firstRequestOf({"validate", "7"}), "observe");
+  EXPECT_EQ(firstRequestOf({"send", "--id", "7", "--category", "4", "--type", "1", "a=1"}),
+            "reporterIDValid");
+  EXPECT_EQ(firstRequestOf({"replay", recording}), "createReportingSession");
+  EXPECT_EQ(firstRequestOf({"kill"}), "killService");
+  EXPECT_THAT(daemon().requestsFor("observe"), SizeIs(2));
+}
+
+TEST_F(CommandLineTest, LooksAtADaemonThatDoesNotKnowOnlookers) {
+  daemon().refuse("observe", messagingError(kUnknownMethod, "there is no method observe"));
+  daemon().setSessions({7});
+  EXPECT_EQ(run({"validate", "7"}), kDone);
+  EXPECT_THAT(errors(), IsEmpty());
 }
 
 TEST_F(CommandLineTest, SendsAPayloadToAllWithoutANamedSession) {

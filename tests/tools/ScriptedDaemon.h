@@ -2,10 +2,12 @@
 #pragma once
 
 #include <condition_variable>
+#include <cstdint>
 #include <map>
 #include <memory>
 #include <mutex>
 #include <optional>
+#include <set>
 #include <string>
 #include <thread>
 #include <utility>
@@ -44,11 +46,18 @@ class ScriptedDaemon {
 
   // Before the first request.
   void answer(const std::string& method, Value result) { results_[method] = std::move(result); }
+  // Has sessions of these identifiers, and no others, of the service type 2.
+  void setSessions(std::set<std::int64_t> identifiers) { sessions_ = std::move(identifiers); }
   void refuse(const std::string& method, ReplyError error) { errors_[method] = std::move(error); }
 
   std::vector<Request> requests() const {
     const std::lock_guard lock(mutex_);
     return requests_;
+  }
+  std::vector<Request> requestsFor(const std::string& method) const {
+    std::vector<Request> found = requests();
+    std::erase_if(found, [&](const Request& request) { return request.method != method; });
+    return found;
   }
 
  private:
@@ -95,9 +104,15 @@ class ScriptedDaemon {
   }
 
   void handle(const std::string& method, Arguments arguments, const Reply& reply) {
+    const std::int64_t first = arguments.empty() || !arguments[0] ? 0 : arguments[0]->integer();
     {
       const std::lock_guard lock(mutex_);
       requests_.push_back({method, std::move(arguments)});
+    }
+    if (sessions_ && method == "reporterIDValid") {
+      const bool isKnown = sessions_->contains(first);
+      return reply(std::nullopt,
+                   ValueMap{{"reporterID", isKnown ? first : 0}, {"serviceType", isKnown ? 2 : 65535}});
     }
     if (errors_.contains(method)) return reply(errors_[method]);
     if (results_.contains(method)) return reply(std::nullopt, results_[method]);
@@ -110,6 +125,7 @@ class ScriptedDaemon {
   LogCategory category_{log_, "com.orvane.tonewerk", "twrs"};
   std::map<std::string, Value> results_;
   std::map<std::string, ReplyError> errors_;
+  std::optional<std::set<std::int64_t>> sessions_;
   mutable std::mutex mutex_;
   std::condition_variable ending_;
   // Guarded by mutex_.

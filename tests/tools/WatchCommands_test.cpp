@@ -77,7 +77,19 @@ TEST_F(WatchCommandsTest, TopPrintsOneFrameWhereThereIsNoTerminal) {
             "1 session, 0.0 messages a second\n"
             "session  service    application  client  msg/s  redundant  running\n"
             "77       telephony               ? 11    0.0    -          -\n");
-  EXPECT_THAT(daemon.requests(), SizeIs(2));
+  EXPECT_THAT(daemon.requestsFor("watch.sessions"), SizeIs(2));
+}
+
+TEST_F(WatchCommandsTest, WhoWatchesSaysFirstThatItOnlyLooksOn) {
+  answerSessions({});
+  answerMessages(0, {message(1)});
+  for (const std::vector<const char*>& command :
+       {std::vector{"top", "--interval", "0.05"}, std::vector{"tail", "--count", "1"}}) {
+    const std::size_t before = daemon.requests().size();
+    EXPECT_EQ(run(command), kDone);
+    ASSERT_GT(daemon.requests().size(), before);
+    EXPECT_EQ(daemon.requests()[before].method, "observe") << command[0];
+  }
 }
 
 TEST_F(WatchCommandsTest, TopPrintsAnObjectASessionForPrograms) {
@@ -92,14 +104,15 @@ TEST_F(WatchCommandsTest, TopAsksForThePortionsThatAreLeft) {
                 ValueMap{{"total", 3}, {"sessions", ValueArray{ValueMap{{"reporterID", 7}}}}});
   EXPECT_EQ(run({"top", "--json", "--interval", "0.05"}), kDone);
   std::vector<std::int64_t> firsts;
-  for (const auto& request : daemon.requests()) firsts.push_back(request.arguments.at(0)->integer());
+  for (const auto& request : daemon.requestsFor("watch.sessions"))
+    firsts.push_back(request.arguments.at(0)->integer());
   EXPECT_THAT(firsts, ElementsAre(0, 1, 2, 0, 1, 2));
 }
 
 TEST_F(WatchCommandsTest, TopStopsAskingWhenAPortionIsEmpty) {
   daemon.answer("watch.sessions", ValueMap{{"total", 3}, {"sessions", ValueArray{}}});
   EXPECT_EQ(run({"top", "--json", "--interval", "0.05"}), kDone);
-  EXPECT_THAT(daemon.requests(), SizeIs(2));
+  EXPECT_THAT(daemon.requestsFor("watch.sessions"), SizeIs(2));
 }
 
 TEST_F(WatchCommandsTest, BothSayThatTheyAreNotPermitted) {

@@ -19,10 +19,15 @@ bool isTooLarge(const std::error_code& error) {
 
 }  // namespace
 
-bool Daemon::connect() {
+bool Daemon::connect(Role role) {
   const std::vector<std::string> paths = tool_.socketPaths();
   const std::error_code error = client_.connect(paths);
-  if (!error) return true;
+  if (!error) {
+    // A daemon too old to know the request says so, and works as without it; one that is gone shows with the
+    // next request.
+    if (role == Role::kOnlooker) static_cast<void>(client_.request("observe", {}, {}));
+    return true;
+  }
   std::string tried;
   for (const std::string& path : paths) tried += (tried.empty() ? "" : ", ") + path;
   tool_.status = tool_.fail(kNoDaemon, "no daemon listens on " + tried + " (" + error.message() + ")");

@@ -25,8 +25,11 @@ class Daemon {
   // `tool` outlives it.
   explicit Daemon(Tool& tool) : tool_(tool) {}
 
+  // An onlooker asks and changes nothing; the daemon refuses what would, and keeps no record of its visit.
+  enum class Role { kClient, kOnlooker };
+
   // False when no daemon listens.
-  bool connect();
+  bool connect(Role role);
 
   // The answer's result (none for nil) in `result`. False when the request was refused or not answered.
   bool call(std::string_view method, const Arguments& arguments, std::optional<Value>& result);

@@ -14,7 +14,7 @@ constexpr std::chrono::seconds kEndTimeout{30};
 // There is no answer: the connection ends with the daemon.
 void kill(Tool& tool) {
   Daemon daemon(tool);
-  if (!daemon.connect()) return;
+  if (!daemon.connect(Daemon::Role::kClient)) return;
   std::error_code error;
   const auto answer = daemon.client().call("killService", {}, kEndTimeout, error);
   if (answer && answer->error) {

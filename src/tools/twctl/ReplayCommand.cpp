@@ -58,7 +58,7 @@ void replay(Tool& tool, const ReplayOptions& options) {
   }
   const std::optional<Recording> recording = readRecording(tool, options.file);
   Daemon daemon(tool);
-  if (!recording || !daemon.connect()) return;
+  if (!recording || !daemon.connect(Daemon::Role::kClient)) return;
 
   RecordingPlayer player(daemon.client(), *speed, [&](const RecordedCall& call, const std::string& why) {
     tool.status = tool.fail(kRefused, options.file + ": line " + std::to_string(call.line) + ": " + why);

@@ -8,6 +8,7 @@
 #include "platform/JsonService.h"
 #include "tools/twctl/Commands.h"
 #include "tools/twctl/Daemon.h"
+#include "tools/twctl/SessionLookup.h"
 #include "tools/twctl/ValueArguments.h"
 
 namespace tonewerk {
@@ -44,6 +45,21 @@ std::optional<ValueMap> payloadOf(const Tool& tool, const SendOptions& options, 
   return map;
 }
 
+// Whether all of them are sessions; says which are none. The daemon itself passes over those in silence.
+bool knowsAll(Tool& tool, Daemon& daemon, const std::vector<ReporterID>& reporterIDs) {
+  std::string unknown;
+  for (const ReporterID reporterID : reporterIDs) {
+    std::optional<AudioServiceType> serviceType;
+    if (!lookUpSession(daemon, reporterID, serviceType)) return false;
+    if (reporterID == 0 || !serviceType)
+      unknown += (unknown.empty() ? "" : ", ") + std::to_string(reporterID);
+  }
+  if (unknown.empty()) return true;
+  tool.status =
+      tool.fail(kRefused, "no session has the identifier " + unknown + "; the message was sent to none");
+  return false;
+}
+
 void send(Tool& tool, const SendOptions& options) {
   const auto refuseUsage = [&tool](const std::string& problem) {
     tool.status = tool.fail(kWrongUsage, problem);
@@ -58,7 +74,7 @@ void send(Tool& tool, const SendOptions& options) {
 
   Daemon daemon(tool);
   std::optional<Value> result;
-  if (!daemon.connect()) return;
+  if (!daemon.connect(Daemon::Role::kClient) || !knowsAll(tool, daemon, options.reporterIDs)) return;
   Argument recipients;
   if (!options.reporterIDs.empty())
     recipients = ValueArray(std::vector<Value>(options.reporterIDs.begin(), options.reporterIDs.end()));

@@ -73,7 +73,7 @@ void tail(Tool& tool, const TailOptions& options) {
     return;
   }
   Daemon daemon(tool);
-  if (!daemon.connect()) return;
+  if (!daemon.connect(Daemon::Role::kOnlooker)) return;
   LiveEvents events(-1, tool.outDescriptor);
   const auto waitReadable = [&events](int descriptor) {
     LiveEvents::Event event{};

@@ -129,7 +129,7 @@ void showOnTerminal(Tool& tool, Daemon& daemon, double interval) {
 
 void top(Tool& tool, double interval) {
   Daemon daemon(tool);
-  if (!daemon.connect()) return;
+  if (!daemon.connect(Daemon::Role::kOnlooker)) return;
   if (tool.outIsTerminal && !tool.asJson) {
     showOnTerminal(tool, daemon, interval);
   } else {

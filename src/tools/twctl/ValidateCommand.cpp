@@ -3,9 +3,9 @@
 #include <cstdint>
 #include <memory>
 
-#include "service/TWReportingServiceProtocol.h"
 #include "tools/twctl/Commands.h"
 #include "tools/twctl/Daemon.h"
+#include "tools/twctl/SessionLookup.h"
 #include "tools/twctl/SessionTable.h"
 #include "tools/twctl/ValueArguments.h"
 
@@ -14,16 +14,13 @@ namespace {
 
 void validate(Tool& tool, ReporterID reporterID) {
   Daemon daemon(tool);
-  std::optional<Value> validity;
-  if (!daemon.connect() || !daemon.call("reporterIDValid", {Value(reporterID)}, validity)) return;
-  const ValueMap* session = validity ? validity->asMap() : nullptr;
-  // 0 is the answer for an identifier that nobody has.
-  if (reporterID == 0 || session == nullptr || session->integer(TWReporterProxyKeyReporterID) != reporterID) {
+  std::optional<AudioServiceType> serviceType;
+  if (!daemon.connect(Daemon::Role::kOnlooker) || !lookUpSession(daemon, reporterID, serviceType)) return;
+  if (reporterID == 0 || !serviceType) {
     tool.status = tool.fail(kRefused, "no session has the identifier " + std::to_string(reporterID));
     return;
   }
-  SessionTable(tool).add(reporterID,
-                         static_cast<AudioServiceType>(session->integer(TWReporterProxyKeyServiceType)));
+  SessionTable(tool).add(reporterID, *serviceType);
 }
 
 }  // namespace

@@ -1,0 +1,17 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <optional>
+
+#include "session/AudioEvent.h"
+
+namespace tonewerk {
+
+class Daemon;
+
+// Asks the daemon for the session of that identifier: its service type in `serviceType`, or none when nobody
+// has it. 0, by which the answer says "nobody", is always found. False when the daemon did not answer, which
+// has then been said.
+bool lookUpSession(Daemon& daemon, ReporterID reporterID, std::optional<AudioServiceType>& serviceType);
+
+}  // namespace tonewerk
