@@ -7,6 +7,7 @@
 #include <stdlib.h>
 #include <string>
 #include <sys/socket.h>
+#include <utility>
 #include <vector>
 
 #include "platform/linux/FileDescriptor.h"
@@ -88,6 +89,52 @@ TEST_F(CommandLineTest, CallsWrongUsageWrong) {
            {"notify", "get"}}) {
     EXPECT_EQ(run(wrong), kWrongUsage) << testing::PrintToString(wrong);
     EXPECT_THAT(errors(), testing::Not(IsEmpty()));
+  }
+}
+
+// "--watch: --watch:" it said, and of a command that there is not that one is required.
+TEST_F(CommandLineTest, SaysInOneLineWhatIsWrong) {
+  const std::vector<std::pair<std::vector<std::string>, std::string>> wrong{
+      {{}, "a command is required; see twctl --help"},
+      {{"defaults"}, "a command is required; see twctl defaults --help"},
+      {{"evnts"}, "unknown command 'evnts'; did you mean 'events'?"},
+      {{"nonsense"}, "unknown command 'nonsense'"},
+      {{"defaults", "wirte", "a", "b", "c"}, "unknown command 'wirte'; did you mean 'write'?"},
+      {{"captures", "lst"}, "unknown command 'lst'; did you mean 'list'?"},
+      {{"--jsn", "list"}, "unknown option '--jsn'; did you mean '--json'?"},
+      {{"events", "--sinse=1d"}, "unknown option '--sinse'; did you mean '--since'?"},
+      {{"events", "-x"}, "unknown option '-x'"},
+      {{"list", "more"}, "unexpected argument 'more'"},
+      {{"validate"}, "ID is required"},
+      {{"validate", "x"}, "ID: \"x\" is no signed 64-bit number"},
+      {{"send", "--type", "Start", "a=1"}, "--category is required"},
+      {{"send", "--category", "4", "--type", "1"}, "KEY=VALUE or --payload is required"},
+      {{"send", "--category", "Playbak", "--type", "1", "a=1"},
+       "there is no category 'Playbak'; did you mean 'Playback'?"},
+      {{"send", "--category", "hal_playback", "--type", "1", "a=1"},
+       "there is no category 'hal_playback'; did you mean 'HAL_Playback'?"},
+      {{"send", "--category", "Nonsense", "--type", "1", "a=1"},
+       "there is no category 'Nonsense'; there are Generic, Record, Input, Playback, Output, "
+       "PlaybackAndRecord, "
+       "IO, Setup, ClientRequest, RouteChange, Error, Chanmetering, Performance, Volume, Gather and "
+       "HearingHealth"},
+      {{"send", "--category", "4", "--type", "Nonsense", "a=1"},
+       "there is no type 'Nonsense'; there are Generic, Start, Stop, Activate, Deactivate, Setup, Error, "
+       "IssueDetector, Energybook, ModulonUsage, MIDIDriver, Summary, HeadphoneAudioExposure, AudioExposure, "
+       "Listeningenhancement, Pellix, Simple, Histogram, State and MemoryLog"},
+      {{"tail", "--type", "Strat"}, "there is no type 'Strat'; did you mean 'Start'?"},
+      {{"channels", "--watch", "0"}, "--watch: \"0\" is no number of seconds from 0.05 to 86400"},
+      {{"top", "--interval", "nan"}, "--interval: \"nan\" is no number of seconds from 0.05 to 86400"},
+      {{"top", "--interval", "86401"}, "--interval: \"86401\" is no number of seconds from 0.05 to 86400"},
+      {{"events", "--limit", "0"}, "--limit: \"0\" is no whole number from 1"},
+      {{"tail", "--count", "x"}, "--count: \"x\" is no whole number from 1"},
+      {{"events", "--limit"}, "--limit needs a value"},
+  };
+  for (const auto& [command, problem] : wrong) {
+    SCOPED_TRACE(testing::PrintToString(command));
+    EXPECT_EQ(run(command), kWrongUsage);
+    EXPECT_THAT(output(), IsEmpty());
+    EXPECT_EQ(errors(), "twctl: " + problem + "\n");
   }
 }
 

@@ -10,12 +10,10 @@
 #include "tools/twctl/ChannelPrinter.h"
 #include "tools/twctl/Commands.h"
 #include "tools/twctl/ToolLog.h"
+#include "tools/twctl/ValueArguments.h"
 
 namespace tonewerk {
 namespace {
-
-constexpr double kLeastSeconds = 0.05;
-constexpr double kMostSeconds = 86400;
 
 struct ChannelsOptions {
   ChannelFilter filter;
@@ -45,12 +43,13 @@ void showChannels(Tool& tool, const ChannelsOptions& options) {
   }
 }
 
-// The option's text is empty when nothing follows it.
-std::string readInterval(const std::string& text, double& seconds) {
+// What is wrong with the interval, or an empty text. The option's text is empty when nothing follows it.
+std::string takeInterval(const std::string& text, ChannelsOptions& options) {
+  options.watches = true;
   if (text.empty()) return {};
-  if (CLI::detail::lexical_cast(text, seconds) && seconds >= kLeastSeconds && seconds <= kMostSeconds)
-    return {};
-  return "\"" + text + "\" is no number of seconds from 0.05 to 86400";
+  std::string problem = problemWithSeconds(text);
+  if (problem.empty()) options.seconds = valueOfArgument(text).number();
+  return problem;
 }
 
 }  // namespace
@@ -71,11 +70,7 @@ void addChannelsCommand(CLI::App& app, Tool& tool) {
                   "What changes in each interval of so many seconds (1), until interrupted")
       ->expected(0, 1)
       ->type_name("SECONDS")
-      ->each([options](const std::string& text) {
-        options->watches = true;
-        const std::string problem = readInterval(text, options->seconds);
-        if (!problem.empty()) throw CLI::ValidationError("--watch", problem);
-      });
+      ->check([options](const std::string& text) { return takeInterval(text, *options); });
   command.callback([&tool, options, interval] { showChannels(tool, *options); });
 }
 

@@ -4,6 +4,8 @@
 #include <CLI/CLI.hpp>
 #include <exception>
 
+#include "tools/twctl/UsageProblem.h"
+
 namespace tonewerk {
 
 CLI::App& addCommand(CLI::App& app, Tool& tool, const std::string& name, const std::string& description) {
@@ -43,7 +45,10 @@ int runCommandLine(int argc, const char* const* argv, Tool& tool) {
   try {
     app.parse(argc, argv);
   } catch (const CLI::ParseError& error) {
-    tool.status = app.exit(error, tool.out, tool.err) == 0 ? kDone : kWrongUsage;
+    // Help is such an error, too.
+    const bool isAnswer = error.get_exit_code() == 0;
+    tool.status =
+        isAnswer ? app.exit(error, tool.out, tool.err) : tool.fail(kWrongUsage, usageProblem(app, error));
   } catch (const std::exception& error) {
     return tool.fail(kRefused, error.what());
   }

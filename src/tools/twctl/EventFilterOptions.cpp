@@ -3,10 +3,10 @@
 
 #include <CLI/CLI.hpp>
 #include <chrono>
-#include <limits>
 
 #include "tools/twctl/TimeArgument.h"
 #include "tools/twctl/Tool.h"
+#include "tools/twctl/ValueArguments.h"
 
 namespace tonewerk {
 namespace {
@@ -37,8 +37,7 @@ void EventFilterOptions::addWithoutNameTo(CLI::App& command) {
       "daemon runs or not.");
   command.add_option("--since", since_, "Only events from this time on");
   command.add_option("--until", until_, "Only events up to this time");
-  command.add_option("--limit", limit_, "Only the newest so many")
-      ->check(CLI::Range(std::int64_t{1}, std::numeric_limits<std::int64_t>::max()));
+  command.add_option("--limit", limit_, "Only the newest so many")->check(problemWithCount);
 }
 
 std::optional<EventFilter> EventFilterOptions::filter(Tool& tool) const {

@@ -65,9 +65,9 @@ void send(Tool& tool, const SendOptions& options) {
     tool.status = tool.fail(kWrongUsage, problem);
   };
   const auto category = categoryOfArgument(options.category);
-  if (!category) return refuseUsage("there is no category \"" + options.category + "\"");
+  if (!category) return refuseUsage(unknownCategory(options.category));
   const auto type = typeOfArgument(options.type);
-  if (!type) return refuseUsage("there is no type \"" + options.type + "\"");
+  if (!type) return refuseUsage(unknownType(options.type));
   std::string problem;
   std::optional<ValueMap> payload = payloadOf(tool, options, problem);
   if (!payload) return refuseUsage(problem);

@@ -35,13 +35,13 @@ std::optional<Arguments> filterOf(const TailOptions& options, std::string& probl
   Arguments filter{listOf(options.reporterIDs), std::nullopt, std::nullopt};
   if (options.category) {
     const auto category = categoryOfArgument(*options.category);
-    if (!category) problem = "there is no category \"" + *options.category + "\"";
+    if (!category) problem = unknownCategory(*options.category);
     if (!category) return std::nullopt;
     filter[1] = ValueArray{*category};
   }
   if (options.type) {
     const auto type = typeOfArgument(*options.type);
-    if (!type) problem = "there is no type \"" + *options.type + "\"";
+    if (!type) problem = unknownType(*options.type);
     if (!type) return std::nullopt;
     filter[2] = ValueArray{*type};
   }
@@ -106,8 +106,7 @@ void addTailCommand(CLI::App& app, Tool& tool) {
       ->take_all();
   command.add_option("--category", options->category, "Only of it: a name, as Playback, or a number");
   command.add_option("--type", options->type, "Only of it: a name, as Start, or a number");
-  command.add_option("--count", options->count, "Only so many")
-      ->check(CLI::Range(std::int64_t{1}, std::numeric_limits<std::int64_t>::max()));
+  command.add_option("--count", options->count, "Only so many")->check(problemWithCount);
   command.callback([&tool, options] { tail(tool, *options); });
 }
 

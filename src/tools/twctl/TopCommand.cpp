@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <CLI/CLI.hpp>
+#include <algorithm>
 #include <chrono>
-#include <cmath>
 #include <memory>
 #include <optional>
 #include <ostream>
@@ -15,12 +15,11 @@
 #include "tools/twctl/SessionRates.h"
 #include "tools/twctl/TopFrame.h"
 #include "tools/twctl/TopLoop.h"
+#include "tools/twctl/ValueArguments.h"
 
 namespace tonewerk {
 namespace {
 
-constexpr double kLeastSeconds = 0.05;
-constexpr double kMostSeconds = 86400;
 constexpr char kControlC = 3;
 
 double steadyNow() {
@@ -147,13 +146,9 @@ void addTopCommand(CLI::App& app, Tool& tool) {
       "that the daemon runs as, and root.");
   const auto interval = std::make_shared<double>(1.0);
   command.add_option("--interval", *interval, "Over so many seconds messages are counted (1)")
-      ->check(CLI::Range(kLeastSeconds, kMostSeconds))
+      ->check(problemWithSeconds)
       ->type_name("SECONDS");
-  command.callback([&tool, interval] {
-    // Which is within any range.
-    if (std::isnan(*interval)) throw CLI::ValidationError("--interval", "must be a number");
-    top(tool, *interval);
-  });
+  command.callback([&tool, interval] { top(tool, *interval); });
 }
 
 }  // namespace tonewerk

@@ -24,9 +24,17 @@ std::optional<AudioEventCategory> categoryOfArgument(std::string_view text);
 // "Start", "Unknown" or a number; none for anything else.
 std::optional<AudioEventType> typeOfArgument(std::string_view text);
 
+// That there is no such category or type, and what there is instead.
+std::string unknownCategory(std::string_view text);
+std::string unknownType(std::string_view text);
+
 // What is wrong with a session's identifier; empty when it is a decimal number of 64 bits with a sign. For
 // options that are read into a ReporterID: their own reading takes a number that is too large for the largest
 // there is.
 std::string problemWithReporterID(const std::string& text);
+
+// The same of how many there may be, from 1, and of an interval in seconds, from 0.05 to 86400.
+std::string problemWithCount(const std::string& text);
+std::string problemWithSeconds(const std::string& text);
 
 }  // namespace tonewerk
