@@ -73,7 +73,7 @@ class TwctlTest : public RunningDaemonTest {
 TEST_F(TwctlTest, EveryCommandHelps) {
   const std::vector<std::string> commands{
       "list", "validate", "send",   "replay",   "top",    "tail",      "events",   "metrics", "power",
-      "rtc",  "defaults", "notify", "captures", "drafts", "whirlcaps", "channels", "kill"};
+      "rtc",  "defaults", "notify", "captures", "drafts", "whirlcaps", "channels", "paths",   "kill"};
   EXPECT_EQ(run({"--help"}), kDone);
   for (const std::string& name : commands) {
     SCOPED_TRACE(name);
@@ -200,6 +200,13 @@ TEST_F(TwctlTest, LookingLeavesNoEventBehindAndSendingDoes) {
   const std::vector<json> events = RecordedEvents(daemon.storePath()).named(uptime);
   ASSERT_THAT(events, SizeIs(1));
   EXPECT_EQ(events[0].at("processName"), "twctl");
+}
+
+TEST_F(TwctlTest, TheStoreIsWherePathsSays) {
+  EXPECT_EQ(run({"paths", "store"}), kDone);
+  EXPECT_EQ(output, daemon.storePath() + "\n");
+  EXPECT_EQ(run({"paths", "socket"}), kDone);
+  EXPECT_THAT(output, StartsWith(daemon.socketPath() + "\n"));
 }
 
 TEST_F(TwctlTest, WhatTheHapticsEngineReportsIsInThePowerLog) {

@@ -31,7 +31,7 @@ using testing::StartsWith;
 TEST_F(CommandLineTest, HelpsWithEveryCommand) {
   for (const char* name :
        {"list", "validate", "send", "replay", "top", "tail", "events", "metrics", "power", "rtc", "defaults",
-        "notify", "captures", "drafts", "whirlcaps", "channels", "kill"}) {
+        "notify", "captures", "drafts", "whirlcaps", "channels", "paths", "kill"}) {
     EXPECT_EQ(run({name, "--help"}), kDone);
     EXPECT_THAT(output(), HasSubstr("--json")) << name;
     EXPECT_THAT(errors(), IsEmpty());
@@ -129,6 +129,7 @@ TEST_F(CommandLineTest, SaysInOneLineWhatIsWrong) {
       {{"events", "--limit", "0"}, "--limit: \"0\" is no whole number from 1"},
       {{"tail", "--count", "x"}, "--count: \"x\" is no whole number from 1"},
       {{"events", "--limit"}, "--limit needs a value"},
+      {{"paths", "stor"}, "there is no path 'stor'; did you mean 'store'?"},
   };
   for (const auto& [command, problem] : wrong) {
     SCOPED_TRACE(testing::PrintToString(command));
@@ -136,6 +137,30 @@ TEST_F(CommandLineTest, SaysInOneLineWhatIsWrong) {
     EXPECT_THAT(output(), IsEmpty());
     EXPECT_EQ(errors(), "twctl: " + problem + "\n");
   }
+}
+
+TEST_F(CommandLineTest, SaysWhereThingsAre) {
+  EXPECT_EQ(run({"paths", "store"}), kDone);
+  EXPECT_EQ(output(), directory_.path("state/reports.db") + "\n");
+  EXPECT_EQ(run({"paths", "socket"}), kDone);
+  EXPECT_EQ(output(), socket_ + "\n");
+  EXPECT_EQ(run({"paths", "--json", "runtime"}), kDone);
+  EXPECT_EQ(output(), "{\"name\":\"runtime\",\"path\":\"" + directory_.path("runtime") + "\"}\n");
+  EXPECT_EQ(run({"paths"}), kDone);
+  EXPECT_THAT(output(), HasSubstr("\nconfiguration  " + directory_.path("configuration") + "\n"));
+  EXPECT_EQ(run({"paths", "--system"}), kDone);
+  EXPECT_EQ(output(),
+            "name           path\n"
+            "store          /var/lib/tonewerk/reports.db\n"
+            "runtime        /run/tonewerk\n"
+            "state          /var/lib/tonewerk\n"
+            "logs           /var/log/tonewerk\n"
+            "configuration  /etc/tonewerk\n"
+            "socket         /run/tonewerk/reporting.sock\n");
+  // Without a variable the user's own daemon is tried first, then the system's.
+  unsetenv("TONEWERK_REPORTING_SOCKET");
+  EXPECT_EQ(run({"paths", "socket"}), kDone);
+  EXPECT_EQ(output(), directory_.path("runtime/reporting.sock") + "\n/run/tonewerk/reporting.sock\n");
 }
 
 TEST_F(CommandLineTest, SaysWhereNoDaemonListens) {

@@ -41,6 +41,7 @@ int runCommandLine(int argc, const char* const* argv, Tool& tool) {
   addNotifyCommand(app, tool);
   addDiagnosticsCommands(app, tool);
   addChannelsCommand(app, tool);
+  addPathsCommand(app, tool);
   addKillCommand(app, tool);
   try {
     app.parse(argc, argv);

@@ -28,6 +28,7 @@ void addNotifyCommand(CLI::App& app, Tool& tool);
 // captures, drafts and whirlcaps.
 void addDiagnosticsCommands(CLI::App& app, Tool& tool);
 void addChannelsCommand(CLI::App& app, Tool& tool);
+void addPathsCommand(CLI::App& app, Tool& tool);
 void addKillCommand(CLI::App& app, Tool& tool);
 
 // A command with the options that all have.
