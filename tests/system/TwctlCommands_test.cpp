@@ -360,10 +360,10 @@ TEST_F(TwctlTest, PreferencesAreReadWrittenAndDeleted) {
   EXPECT_EQ(run({"defaults", "write", "org.example", "list", R"(["a", "b"])"}), kDone) << errors;
   EXPECT_EQ(run({"defaults", "write", "org.example", "text", "just words"}), kDone) << errors;
   EXPECT_EQ(run({"defaults", "read", "--json", "org.example"}), kDone);
-  EXPECT_THAT(objects(output),
-              ::testing::UnorderedElementsAre(json{{"key", "configured"}, {"value", 1}},
-                                              json{{"key", "list"}, {"value", {"a", "b"}}},
-                                              json{{"key", "text"}, {"value", "just words"}}));
+  EXPECT_THAT(objects(output), ::testing::UnorderedElementsAre(
+                                   json{{"key", "configured"}, {"from", "configuration"}, {"value", 1}},
+                                   json{{"key", "list"}, {"from", "state"}, {"value", {"a", "b"}}},
+                                   json{{"key", "text"}, {"from", "state"}, {"value", "just words"}}));
   EXPECT_EQ(run({"defaults", "delete", "org.example", "text"}), kDone);
   EXPECT_EQ(run({"defaults", "read", "org.example", "text"}), kRefused);
   EXPECT_EQ(run({"defaults", "delete", "org.example", "configured"}), kRefused);

@@ -127,6 +127,11 @@ void TomlPreferenceStore::checkAllFiles() const {
   }
 }
 
+TomlPreferenceStore::Layers TomlPreferenceStore::readLayers(std::string_view domain) const {
+  Contents contents = contentsOf(domain);
+  return {std::move(contents.configured), std::move(contents.written)};
+}
+
 std::optional<Value> TomlPreferenceStore::read(std::string_view domain, std::string_view key) const {
   const Contents contents = contentsOf(domain);
   const Value* value = contents.written.find(key);

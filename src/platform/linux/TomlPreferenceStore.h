@@ -29,6 +29,13 @@ class TomlPreferenceStore final : public PreferenceStore {
   // The directories need not exist; the second is made when something is written. `log` outlives the store.
   TomlPreferenceStore(std::string configurationDirectory, std::string stateDirectory, const LogCategory& log);
 
+  // What the configuration says of a domain, and what was written over it.
+  struct Layers {
+    ValueMap configured;
+    ValueMap written;
+  };
+  Layers readLayers(std::string_view domain) const;
+
   std::optional<Value> read(std::string_view domain, std::string_view key) const override;
   ValueMap readAll(std::string_view domain) const override;
   std::error_code write(std::string_view domain, std::string_view key, const Value& value,

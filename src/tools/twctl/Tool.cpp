@@ -18,6 +18,11 @@ int Tool::fail(ExitStatus failure, std::string_view problem) const {
   return failure;
 }
 
+void Tool::warn(std::string_view problem) const {
+  out.flush();
+  err << "twctl: warning: " << problem << '\n';
+}
+
 Directories Tool::directories() const {
   return systemWide ? Directories::system() : Directories::fromEnvironment();
 }

@@ -34,6 +34,8 @@ struct Tool {
 
   // Prints "twctl: <problem>" and returns `failure`.
   int fail(ExitStatus failure, std::string_view problem) const;
+  // Prints "twctl: warning: <problem>": it has been done all the same.
+  void warn(std::string_view problem) const;
 
   // Of the caller, or of the system's daemon.
   Directories directories() const;

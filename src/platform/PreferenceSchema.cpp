@@ -1,0 +1,176 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/PreferenceSchema.h"
+
+#include <algorithm>
+#include <cmath>
+#include <cstdint>
+#include <limits>
+
+namespace tonewerk {
+namespace {
+
+using enum PreferenceType;
+
+constexpr double kMostInt32 = std::numeric_limits<std::int32_t>::max();
+
+constexpr std::string_view kMetricon = "com.orvane.metricon";
+constexpr std::string_view kLinkReport = "com.orvane.linkreport";
+constexpr std::string_view kStore = "com.orvane.tonewerk.store";
+constexpr std::string_view kDiagnostics = "com.orvane.tonewerk.diagnostics";
+constexpr std::string_view kTwreporting = "com.orvane.tonewerk.twreporting";
+constexpr std::string_view kCaptures = "com.orvane.tonewerk.captures";
+constexpr std::string_view kTonewerk = "com.orvane.tonewerk";
+constexpr std::string_view kHomedeck = "com.orvane.homedeck";
+
+std::vector<Preference> allPreferences() {
+  const Value everything = ValueArray{ValueMap{{"name", "local"}, {"events", ValueArray{"com.orvane.*"}}}};
+  const Value memoryTools = ValueArray{"tw-memory-usage", "slabtop --once"};
+  return {
+      {kMetricon, "consumers", kTables, everything, "Who asks for which analytics events"},
+      {kLinkReport, "backends", kTexts, ValueArray{"local"}, "Where messages go: local, or addresses"},
+      {kLinkReport, "device_id", kText, {}, "The device's name for receivers; unnamed without"},
+      {kLinkReport, "event_name_attribute", kBoolean, false, "Event names as an attribute, too"},
+      {kStore, "max_megabytes", kNumber, 256, "MiB that the store takes, its log included", 1.0},
+      {kStore, "max_days", kNumber, 30, "Age of the oldest report in days", 1.0},
+      {kDiagnostics, "max_megabytes", kNumber, 256, "MiB of captures, drafts and stall traces", 1.0},
+      {kDiagnostics, "max_items", kNumber, 500, "How many of them are kept", 1.0},
+      {kTwreporting,
+       "VidroInvalidXyBackOffSeconds",
+       kNumber,
+       {},
+       "Seconds between two drafts; off without",
+       0.0},
+      {kTwreporting, "enable_whirlcap", kBoolean, false, "Whether overloads have stall traces made"},
+      {kTwreporting, "io_buffer_size", kInteger, 512, "Smallest buffer that counts, in frames; 0 is 512", 0.0,
+       kMostInt32},
+      {kTwreporting, "io_cycle", kInteger, 0, "First cycle whose overload counts", 0.0, kMostInt32},
+      {kTwreporting, "wait_time", kNumber, 0, "Microseconds from an overload to its trace", 0.0,
+       10'000'000.0},
+      {.domain = kTwreporting,
+       .key = "memory_tools",
+       .type = kTexts,
+       .fallback = memoryTools,
+       .meaning = "The memory log's two commands",
+       .count = 2},
+      {kTwreporting, "VidroComponentIdentifier", kInteger, 0, "The drafts' component in the bug tracker"},
+      {.domain = kTwreporting,
+       .key = "VidroInvalidXyIDRlastRun",
+       .type = kNumber,
+       .fallback = {},
+       .meaning = "When the last draft was made, in seconds since 1970",
+       .keeper = PreferenceKeeper::kDaemon},
+      {.domain = kCaptures,
+       .key = "accepted",
+       .type = kTable,
+       .fallback = {},
+       .meaning = "How many captures which day has seen",
+       .keeper = PreferenceKeeper::kDaemon},
+      {kTonewerk, "device_name", kText, {}, "The device's name in reports"},
+      {kTonewerk, "disable_reporting", kBoolean, false, "Read, and changes nothing"},
+      {kHomedeck, "spatial-audio-accessory-feature", kAny, {}, "Told to every session"},
+  };
+}
+
+bool isNumber(const Value& value) {
+  return value.asInteger() != nullptr || value.asUnsigned() != nullptr || value.asDouble() != nullptr;
+}
+
+bool isWithin(const Preference& preference, double number) {
+  return !std::isnan(number) && (!preference.least || number >= *preference.least) &&
+         (!preference.most || number <= *preference.most);
+}
+
+// Whether it is an array of as many entries as there must be, all of which `suit`.
+template <typename Suits>
+bool isArray(const Preference& preference, const Value& value, Suits suits) {
+  const ValueArray* array = value.asArray();
+  return array != nullptr && (preference.count == 0 || array->size() == preference.count) &&
+         std::all_of(array->begin(), array->end(), suits);
+}
+
+bool suits(const Preference& preference, const Value& value) {
+  switch (preference.type) {
+    case kBoolean:
+      return value.asBoolean() != nullptr;
+    case kInteger:
+      return (value.asInteger() != nullptr || value.asUnsigned() != nullptr) &&
+             isWithin(preference, value.number());
+    case kNumber:
+      return isNumber(value) && isWithin(preference, value.number());
+    case kText:
+      return value.asString() != nullptr;
+    case kTexts:
+      return isArray(preference, value, [](const Value& entry) { return entry.asString() != nullptr; });
+    case kTables:
+      return isArray(preference, value, [](const Value& entry) { return entry.asMap() != nullptr; });
+    case kTable:
+      return value.asMap() != nullptr;
+    case kAny:
+      return true;
+  }
+  return false;
+}
+
+// Whole numbers without a point.
+std::string numberText(double number) { return std::to_string(static_cast<std::int64_t>(number)); }
+
+std::string rangeText(const Preference& preference) {
+  std::string text;
+  if (preference.least) text += " from " + numberText(*preference.least);
+  if (preference.most) text += " to " + numberText(*preference.most);
+  return text;
+}
+
+// As it would be written.
+std::string textInQuotes(const Value& value) {
+  if (const bool* boolean = value.asBoolean()) return *boolean ? "true" : "false";
+  return value.asString() == nullptr ? value.text() : '"' + value.text() + '"';
+}
+
+}  // namespace
+
+const std::vector<Preference>& preferenceSchema() {
+  static const std::vector<Preference> schema = allPreferences();
+  return schema;
+}
+
+const Preference* findPreference(std::string_view domain, std::string_view key) {
+  const std::vector<Preference>& schema = preferenceSchema();
+  const auto found = std::find_if(schema.begin(), schema.end(), [&](const Preference& preference) {
+    return preference.domain == domain && preference.key == key;
+  });
+  return found == schema.end() ? nullptr : &*found;
+}
+
+std::string typeText(const Preference& preference) {
+  switch (preference.type) {
+    case kBoolean:
+      return "boolean";
+    case kInteger:
+      return "integer" + rangeText(preference);
+    case kNumber:
+      return "number" + rangeText(preference);
+    case kText:
+      return "text";
+    case kTexts:
+      return preference.count == 2 ? "array of two texts" : "array of texts";
+    case kTables:
+      return "array of tables";
+    case kTable:
+      return "table";
+    case kAny:
+      return "any value";
+  }
+  return "";
+}
+
+std::optional<std::string> problemWith(const Preference& preference, const Value& value) {
+  if (suits(preference, value)) return std::nullopt;
+  const std::string type = typeText(preference);
+  const bool beginsWithVowel = std::string_view("aeiou").find(type.front()) != std::string_view::npos;
+  const std::string wanted =
+      preference.type == kBoolean ? "true or false" : (beginsWithVowel ? "an " : "a ") + type;
+  return std::string(preference.key) + " must be " + wanted + ", not " + textInQuotes(value);
+}
+
+}  // namespace tonewerk

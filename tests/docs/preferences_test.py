@@ -1,0 +1,97 @@
+# SPDX-License-Identifier: Apache-2.0
+"""The schema of the preferences, their manual page, the files that are shipped and the sources that read them."""
+
+import json
+import pathlib
+import re
+import tempfile
+import tomllib
+import unittest
+
+from programs import PROGRAMS, SOURCE, run
+
+SHIPPED = sorted((SOURCE / "packaging/etc/preferences").iterdir())
+
+
+def schema():
+    answer = run([PROGRAMS / "twctl", "defaults", "describe", "--json"])
+    if answer.returncode != 0:
+        raise AssertionError(answer.stderr)
+    return [json.loads(line) for line in answer.stdout.splitlines()]
+
+
+def explained():
+    """What the manual page says of each key: its type and its default, as texts."""
+    page = (SOURCE / "docs/man/tonewerk-reporting-preferences.5").read_text().replace(r"\(dq", '"')
+    found = {}
+    for domain, text in re.findall(r"^\.Ss (com\.\S+)\n(.*?)(?=^\.S[sh] )", page, re.DOTALL | re.MULTILINE):
+        for key, words in re.findall(r"^\.It Li (\S+) Pq (.*)", text, re.MULTILINE):
+            found[domain, key] = words.split(", default ", 1)
+    return found
+
+
+def without_comment_marks(path):
+    """The file as somebody makes use of it: with its settings in force."""
+    return "".join(line[1:] if re.match(r"#\[|#\w+ =", line) else line for line in path.read_text().splitlines(True))
+
+
+class PreferencesTest(unittest.TestCase):
+    def test_the_manual_page_says_what_the_schema_says(self):
+        page = explained()
+        rows = schema()
+        self.assertGreater(len(rows), 15)
+        self.assertEqual([(row["domain"], row["key"]) for row in rows if row["keeper"] == "daemon"],
+                         [("com.orvane.tonewerk.twreporting", "VidroInvalidXyIDRlastRun"),
+                          ("com.orvane.tonewerk.captures", "accepted")])
+        self.assertEqual({(row["domain"], row["key"]) for row in rows}, set(page))
+        for row in rows:
+            with self.subTest(key=row["key"]):
+                kind, default = page[row["domain"], row["key"]]
+                self.assertEqual(kind, row["type"])
+                told = None if default == "none" else tomllib.loads(f"value = {default}")["value"]
+                self.assertEqual(told, row["default"])
+
+    def test_shipped_files_hold_what_their_keys_may_be(self):
+        self.assertGreater(len(SHIPPED), 3)
+        for path in SHIPPED:
+            with self.subTest(file=path.name), tempfile.TemporaryDirectory() as scratch:
+                preferences = pathlib.Path(scratch) / "preferences"
+                preferences.mkdir()
+                text = without_comment_marks(path)
+                (preferences / path.name).write_text(text)
+                answer = run(
+                    [PROGRAMS / "twctl", "defaults", "read", "--json", path.stem],
+                    env={"CONFIGURATION_DIRECTORY": scratch, "STATE_DIRECTORY": scratch + "/state"},
+                )
+                self.assertEqual((answer.returncode, answer.stderr), (0, ""))
+                rows = {row["key"]: row for row in map(json.loads, answer.stdout.splitlines())}
+                known = {row["key"] for row in schema() if row["domain"] == path.stem}
+                set_keys = set(tomllib.loads(text))
+                self.assertNotEqual(set_keys, set())
+                self.assertLessEqual(set_keys, known)
+                self.assertEqual({key for key in rows if rows[key]["from"] == "configuration"}, set_keys)
+
+    def test_every_preference_that_the_sources_read_is_in_the_schema(self):
+        rooms = [SOURCE / "src" / room for room in ("session", "monitor", "workers", "driver", "service", "platform/linux")]
+        text = "\n".join(path.read_text() for room in rooms for path in sorted(room.rglob("*.[hc]*")))
+        reading = r"(?:read|bound|booleanPreference|getEnableFlag|getRunTimeDefaults|getDoubleRunTimeDefaults|hasRunInTimeframe)"
+        arguments = " ".join(re.findall(rf"\b{reading}\(([^()]*)\)", text))
+        names = set(re.findall(r"\bk[A-Z]\w+", arguments))
+        read = {word for name in names for word in re.findall(rf'\b{name} = "([^"]+)"', text)}
+        self.assertGreater(len(read), 15)
+        self.assertEqual(read - {row[column] for row in schema() for column in ("domain", "key")}, set())
+
+    def test_every_preference_of_the_schema_is_in_the_sources(self):
+        text = "\n".join(
+            path.read_text()
+            for path in (SOURCE / "src").rglob("*.[hc]*")
+            if not path.name.startswith("PreferenceSchema") and "tools" not in path.parts
+        )
+        for row in schema():
+            with self.subTest(key=row["key"]):
+                self.assertIn(f'"{row["key"]}"', text)
+                self.assertIn(f'"{row["domain"]}"', text)
+
+
+if __name__ == "__main__":
+    unittest.main()

@@ -1,0 +1,82 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/PreferenceSchema.h"
+
+#include <gmock/gmock.h>
+#include <limits>
+#include <set>
+#include <string>
+#include <utility>
+
+namespace tonewerk {
+namespace {
+
+TEST(PreferenceSchemaTest, HasEachPreferenceOnce) {
+  std::set<std::pair<std::string_view, std::string_view>> seen;
+  for (const Preference& preference : preferenceSchema()) {
+    EXPECT_TRUE(seen.emplace(preference.domain, preference.key).second) << preference.key;
+    EXPECT_EQ(findPreference(preference.domain, preference.key), &preference);
+  }
+  EXPECT_GT(seen.size(), 15U);
+  EXPECT_EQ(findPreference("com.orvane.metricon", "max_days"), nullptr);
+}
+
+TEST(PreferenceSchemaTest, ADefaultIsWhatThePreferenceMayBe) {
+  for (const Preference& preference : preferenceSchema()) {
+    if (preference.fallback) EXPECT_EQ(problemWith(preference, *preference.fallback), std::nullopt);
+  }
+}
+
+TEST(PreferenceSchemaTest, WhatTheDaemonKeepsHasNoDefault) {
+  for (const Preference& preference : preferenceSchema()) {
+    if (preference.keeper == PreferenceKeeper::kDaemon) EXPECT_FALSE(preference.fallback) << preference.key;
+  }
+}
+
+// They are shown indented by four, also where a terminal has sixty columns.
+TEST(PreferenceSchemaTest, AMeaningIsAShortLine) {
+  for (const Preference& preference : preferenceSchema()) {
+    EXPECT_THAT(preference.meaning.size(), testing::AllOf(testing::Ge(5U), testing::Le(56U)))
+        << preference.key;
+  }
+}
+
+TEST(PreferenceSchemaTest, KeepsToRangesAtTheirEnds) {
+  const Preference& cycle = *findPreference("com.orvane.tonewerk.twreporting", "io_cycle");
+  EXPECT_EQ(problemWith(cycle, 0), std::nullopt);
+  EXPECT_EQ(problemWith(cycle, 2147483647), std::nullopt);
+  EXPECT_NE(problemWith(cycle, -1), std::nullopt);
+  EXPECT_NE(problemWith(cycle, std::int64_t{2147483648}), std::nullopt);
+  EXPECT_NE(problemWith(cycle, 1.0), std::nullopt);
+  const Preference& days = *findPreference("com.orvane.tonewerk.store", "max_days");
+  EXPECT_EQ(problemWith(days, 1.0), std::nullopt);
+  EXPECT_EQ(problemWith(days, 1e300), std::nullopt);
+  EXPECT_NE(problemWith(days, 0.999), std::nullopt);
+  EXPECT_NE(problemWith(days, std::numeric_limits<double>::quiet_NaN()), std::nullopt);
+}
+
+TEST(PreferenceSchemaTest, TellsTypesApart) {
+  const std::pair<PreferenceType, Value> fitting[] = {
+      {PreferenceType::kBoolean, true},
+      {PreferenceType::kInteger, 5},
+      {PreferenceType::kNumber, 2.5},
+      {PreferenceType::kText, "a"},
+      {PreferenceType::kTexts, ValueArray{"a"}},
+      {PreferenceType::kTables, ValueArray{ValueMap{{"a", 1}}}},
+      {PreferenceType::kTable, ValueMap{{"a", 1}}},
+  };
+  for (const auto& [type, own] : fitting) {
+    for (const auto& [otherType, value] : fitting) {
+      const Preference preference{.domain = "d", .key = "k", .type = type, .fallback = {}, .meaning = "m"};
+      const bool suits =
+          type == otherType || (type == PreferenceType::kNumber && otherType == PreferenceType::kInteger);
+      EXPECT_EQ(problemWith(preference, value).has_value(), !suits)
+          << typeText(preference) << " " << value.text();
+    }
+  }
+  const Preference any{
+      .domain = "d", .key = "k", .type = PreferenceType::kAny, .fallback = {}, .meaning = "m"};
+  EXPECT_EQ(problemWith(any, ValueArray{}), std::nullopt);
+}
+
+}  // namespace
+}  // namespace tonewerk
