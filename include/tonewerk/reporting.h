@@ -18,8 +18,9 @@
  *   unsigned char memory[128];
  *   twr_payload payload;
  *   twr_payload_init(&payload, memory, sizeof memory);
+ *   twr_put_bool(&payload, "session_output_running", 1);
  *   twr_put_double(&payload, "QMSessionVolume", 0.5);
- *   twr_session_send(session, TWR_CATEGORY_VOLUME, TWR_TYPE_GENERIC, &payload, NULL, NULL);
+ *   twr_session_send(session, TWR_CATEGORY_PLAYBACK, TWR_TYPE_START, &payload, NULL, NULL);
  *
  *   twr_session_destroy(session, NULL, NULL);
  *   twr_client_destroy(client, 1000);

@@ -12,8 +12,8 @@
 //   tr::Sender sender(session);  // for the audio callback
 //
 //   tr::Payload<128> payload;
-//   payload.put("QMSessionVolume", 0.5).put("muted", false);
-//   sender.send(tr::Category::kVolume, tr::Type::kGeneric, payload);
+//   payload.put("session_output_running", true).put("QMSessionVolume", 0.5);
+//   sender.send(tr::Category::kPlayback, tr::Type::kStart, payload);
 //
 // Objects can be moved and not copied. One whose making failed, or that was moved from, is empty: it converts
 // to false, and its calls do nothing and return Status::kInvalid. A session keeps its client alive and a

@@ -258,6 +258,25 @@ TEST_F(TwctlTest, TheExamplesArePlayedAndRecorded) {
   EXPECT_TRUE(waitForEvents("com.orvane.standalone.HAL_Error.Error", 1));
 }
 
+TEST_F(TwctlTest, TheGuidesRecordingMakesAVolumeSummary) {
+  const std::string guide = textOfFile(example("../docs/guide/report.md"));
+  const std::string begin = "twctl replay /dev/stdin <<'END'\n";
+  const std::size_t from = guide.find(begin);
+  ASSERT_NE(from, std::string::npos);
+  const std::size_t to = guide.find("END\n", from + begin.size());
+  const TemporaryDirectory directory;
+  const std::string file = directory.path("recording.jsonl");
+  std::ofstream(file) << guide.substr(from + begin.size(), to - from - begin.size());
+  EXPECT_EQ(run({"replay", file}), kDone) << errors;
+  const char* name = "com.orvane.tonewerk.Volume.Summary";
+  ASSERT_TRUE(waitForEvents(name, 1));
+  const json summary = RecordedEvents(daemon.storePath()).named(name).at(0);
+  EXPECT_EQ(summary.at("QMSessionVolume"), 0.5);
+  EXPECT_EQ(summary.at("active_devices"), "Speaker");
+  EXPECT_EQ(summary.at("HostApplicationDisplayID"), "org.example.Player");
+  EXPECT_NEAR(summary.at("play_seconds").get<double>(), 2.0, 1.0);
+}
+
 TEST_F(TwctlTest, ABadRecordingIsNotPlayedAndARefusedLineIsNamed) {
   const TemporaryDirectory directory;
   const std::string file = directory.path("recording.jsonl");
