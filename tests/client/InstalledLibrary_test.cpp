@@ -61,10 +61,9 @@ class InstalledLibraryTest : public testing::Test {
     return {};
   }
   static std::string flags(const std::string& where, const std::string& options) {
-    const std::string packages = "PKG_CONFIG_PATH=" + libraryDirectory(where) + "/pkgconfig";
-    return "$(" + packages + " pkg-config --define-variable=prefix=" + where + " " + options +
-           " twreporting)";
+    return "$(PKG_CONFIG_PATH=" + where + "/pkgconfig pkg-config " + options + " twreporting)";
   }
+  // With the packages of a directory.
   void compile(const std::string& where, const std::string& options, const std::string& program) {
     outputOfCommand(TONEWERK_C_COMPILER " -std=c11 -Wall -Wextra -Wpedantic -Werror" + sanitize() + " " +
                     directory.path("program.c") + " -o " + directory.path(program) + " " +
@@ -84,7 +83,7 @@ class InstalledLibraryTest : public testing::Test {
 };
 
 TEST_F(InstalledLibraryTest, IsFoundByPkgConfig) {
-  compile(prefix, "--cflags --libs", "shared");
+  compile(libraryDirectory(prefix), "--cflags --libs", "shared");
   EXPECT_THAT(neededBy(directory.path("shared")), testing::HasSubstr("libtwreporting.so.0"));
   expectReports(directory.path("shared"), "LD_LIBRARY_PATH=" + libraryDirectory(prefix));
 }
@@ -94,7 +93,7 @@ TEST_F(InstalledLibraryTest, IsFoundByPkgConfigAsAStaticLibrary) {
   for (const auto& entry : std::filesystem::directory_iterator(libraryDirectory(prefix)))
     if (entry.path().string().find("libtwreporting.so") != std::string::npos)
       std::filesystem::remove(entry.path());
-  compile(prefix, "--static --cflags --libs", "static");
+  compile(libraryDirectory(prefix), "--static --cflags --libs", "static");
   EXPECT_THAT(neededBy(directory.path("static")), testing::Not(testing::HasSubstr("libtwreporting")));
   expectReports(directory.path("static"));
 }
