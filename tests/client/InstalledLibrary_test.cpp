@@ -98,6 +98,13 @@ TEST_F(InstalledLibraryTest, IsFoundByPkgConfigAsAStaticLibrary) {
   expectReports(directory.path("static"));
 }
 
+TEST_F(InstalledLibraryTest, IsFoundByPkgConfigBeforeItIsInstalled) {
+  compile(TONEWERK_BUILD_DIRECTORY, "--cflags --libs", "shared");
+  EXPECT_THAT(neededBy(directory.path("shared")), testing::HasSubstr("libtwreporting.so.0"));
+  // By itself: the program knows where the library was built.
+  expectReports(directory.path("shared"), "LD_LIBRARY_PATH=");
+}
+
 TEST_F(InstalledLibraryTest, IsFoundByCMake) {
   const std::string build = directory.path("build");
   outputOfCommand(TONEWERK_CMAKE " -S " + directory.path() + " -B " + build +
