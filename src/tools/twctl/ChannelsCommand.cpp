@@ -62,6 +62,8 @@ void addChannelsCommand(CLI::App& app, Tool& tool) {
       "is\n"
       "named, and the exit status is then 1.");
   const auto options = std::make_shared<ChannelsOptions>();
+  // Nothing else is called for an option whose value is left out.
+  command.parse_complete_callback([&command, options] { options->watches = command.count("--watch") > 0; });
   command.add_option("--driver", options->filter.driver, "Only of drivers that this pattern fits");
   command.add_option("--group", options->filter.group, "Only of groups that this pattern fits");
   const auto interval = std::make_shared<std::string>();
