@@ -155,6 +155,8 @@ TEST_F(DefaultsCommandTest, DescribesThePreferencesThereAre) {
             "  max_days  number from 1\n"
             "    Age of the oldest report in days\n"
             "    default 30\n");
+  EXPECT_EQ(run({"defaults", "describe", "com.orvane.linkreport", "event_name_attribute"}), kDone);
+  EXPECT_THAT(output(), HasSubstr("    default false\n"));
   EXPECT_EQ(run({"defaults", "describe", "com.orvane.tonewerk.captures"}), kDone);
   EXPECT_THAT(output(), HasSubstr("    default none\n    kept by the daemon itself\n"));
   EXPECT_EQ(run({"defaults", "describe", "com.orvane.tonewerk.store", "max_days", "--json"}), kDone);

@@ -75,8 +75,13 @@ std::vector<Entry> entriesOf(const std::string& domain, const TomlPreferenceStor
   return entries;
 }
 
+// As it is written, where a boolean's text would be a number.
+const char* wordOf(bool value) { return value ? "true" : "false"; }
+
 Table::Cell cellOf(const std::optional<Value>& value) {
-  return value ? Table::Cell(*value) : Table::Cell("(none)", "null");
+  if (!value) return Table::Cell("(none)", "null");
+  const bool* boolean = value->asBoolean();
+  return boolean == nullptr ? Table::Cell(*value) : Table::Cell(wordOf(*boolean), wordOf(*boolean));
 }
 
 void read(Tool& tool, const DefaultsOptions& options) {
@@ -160,16 +165,21 @@ const char* textOf(PreferenceKeeper keeper) {
   return keeper == PreferenceKeeper::kDaemon ? "daemon" : "people";
 }
 
+std::string defaultText(const Preference& preference) {
+  if (!preference.fallback) return "none";
+  const bool* boolean = preference.fallback->asBoolean();
+  return boolean == nullptr ? preference.fallback->text() : wordOf(*boolean);
+}
+
 // A block a preference: what is said of one is too long for a row.
 void describeToPeople(std::ostream& out, const std::vector<const Preference*>& preferences) {
   std::string_view domain;
   for (const Preference* preference : preferences) {
     if (preference->domain != domain) out << (domain.empty() ? "" : "\n") << preference->domain << '\n';
     domain = preference->domain;
-    const std::optional<Value>& fallback = preference->fallback;
     out << "  " << preference->key << "  " << typeText(*preference) << '\n';
     out << "    " << preference->meaning << '\n';
-    out << "    default " << (fallback ? fallback->text() : "none") << '\n';
+    out << "    default " << defaultText(*preference) << '\n';
     if (preference->keeper == PreferenceKeeper::kDaemon) out << "    kept by the daemon itself\n";
   }
 }
