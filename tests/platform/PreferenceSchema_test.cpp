@@ -22,13 +22,15 @@ TEST(PreferenceSchemaTest, HasEachPreferenceOnce) {
 
 TEST(PreferenceSchemaTest, ADefaultIsWhatThePreferenceMayBe) {
   for (const Preference& preference : preferenceSchema()) {
-    if (preference.fallback) EXPECT_EQ(problemWith(preference, *preference.fallback), std::nullopt);
+    if (!preference.fallback) continue;
+    EXPECT_EQ(problemWith(preference, *preference.fallback), std::nullopt);
   }
 }
 
 TEST(PreferenceSchemaTest, WhatTheDaemonKeepsHasNoDefault) {
   for (const Preference& preference : preferenceSchema()) {
-    if (preference.keeper == PreferenceKeeper::kDaemon) EXPECT_FALSE(preference.fallback) << preference.key;
+    if (preference.keeper != PreferenceKeeper::kDaemon) continue;
+    EXPECT_FALSE(preference.fallback) << preference.key;
   }
 }
 

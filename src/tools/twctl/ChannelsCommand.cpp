@@ -43,10 +43,8 @@ void showChannels(Tool& tool, const ChannelsOptions& options) {
   }
 }
 
-// What is wrong with the interval, or an empty text. The option's text is empty when nothing follows it.
+// What is wrong with the interval, or an empty text.
 std::string takeInterval(const std::string& text, ChannelsOptions& options) {
-  options.watches = true;
-  if (text.empty()) return {};
   std::string problem = problemWithSeconds(text);
   if (problem.empty()) options.seconds = valueOfArgument(text).number();
   return problem;
