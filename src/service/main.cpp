@@ -20,6 +20,7 @@
 #include "platform/LogCategory.h"
 #include "platform/LogLine.h"
 #include "platform/Platform.h"
+#include "platform/linux/AllocatorReclaimer.h"
 #include "platform/linux/CurlHttpClient.h"
 #include "platform/linux/DbusListener.h"
 #include "platform/linux/DiagnosticsStore.h"
@@ -107,7 +108,7 @@ class Daemon {
         diagnostics_(linux.diagnostics()),
         context_(platformOf(linux, directories), allWorkerClasses()),
         service_(TWReportingService::make([this] { endOnKillRequest(); })),
-        listener_(std::move(socket), log, watchdogOf(manager, linux.clock())),
+        listener_(std::move(socket), log, watchdogOf(manager, linux.clock()), ::geteuid(), &linux.memory()),
         dbusListener_(dbusNames(), TWReportingServiceExport::exportedInterface(),
                       dbusAddressFromEnvironment(), log) {
     diagnostics_.removeLeftovers();  // the socket is ours, so no other daemon writes there

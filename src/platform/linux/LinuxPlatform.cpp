@@ -5,6 +5,7 @@
 #include <string>
 
 #include "platform/LogCategory.h"
+#include "platform/linux/AllocatorReclaimer.h"
 #include "platform/linux/DiagnosticsStore.h"
 #include "platform/linux/Directories.h"
 #include "platform/linux/InotifyNotificationService.h"
@@ -85,6 +86,7 @@ struct LinuxPlatform::Adapters {
   LinuxChanmeter chanmeter;
   LinuxCommandRunner commands;
   LinuxDetachedThreads threads;
+  AllocatorReclaimer memory{timers};
   JsonBenchfile benchfile{clock};
 };
 
@@ -97,6 +99,7 @@ Clock& LinuxPlatform::clock() { return adapters_->clock; }
 SerialQueueFactory& LinuxPlatform::queues() { return adapters_->queues; }
 TimerService& LinuxPlatform::timers() { return adapters_->timers; }
 PreferenceStore& LinuxPlatform::preferences() { return adapters_->preferences; }
+AllocatorReclaimer& LinuxPlatform::memory() { return adapters_->memory; }
 JsonService& LinuxPlatform::json() { return adapters_->json; }
 FileSystem& LinuxPlatform::files() { return adapters_->files; }
 LinuxCapsa& LinuxPlatform::capsa() { return adapters_->capsa; }

@@ -7,6 +7,7 @@
 
 namespace tonewerk {
 
+class AllocatorReclaimer;
 class DiagnosticsStore;
 class LinuxCapsa;
 struct Directories;
@@ -30,6 +31,7 @@ class LinuxPlatform {
   PreferenceStore& preferences();
   JsonService& json();
   FileSystem& files();
+  AllocatorReclaimer& memory();
   // Whoever ends the daemon finishes these, in this order, before what uses the Platform is gone.
   LinuxCapsa& capsa();
   DiagnosticsStore& diagnostics();

@@ -8,10 +8,14 @@
 #include <utility>
 
 #include "platform/LogLine.h"
+#include "platform/linux/AllocatorReclaimer.h"
 #include "values/ShortenedText.h"
 
 namespace tonewerk {
 namespace {
+
+// Received in a connection's life, this is much: a frame that never ends may hold forty times its bytes.
+constexpr std::size_t kMuchBytes = std::size_t{512} << 10;
 
 // Of a method that nobody knows, in the answer that says so.
 constexpr std::size_t kMostMethodNameBytes = 64;
@@ -51,7 +55,10 @@ UnixConnection::UnixConnection(const UnixConnectionContext& context, std::uint64
   }
 }
 
-UnixConnection::~UnixConnection() { outbox_->close(); }
+UnixConnection::~UnixConnection() {
+  outbox_->close();
+  noteMemory();
+}
 
 std::string UnixConnection::description() const {
   return "connection " + std::to_string(identifier_) + " of process " + std::to_string(processIdentifier_) +
@@ -87,7 +94,11 @@ void UnixConnection::handleWake() {
 void UnixConnection::receive() {
   const ssize_t count =
       ::recv(socket_.get(), context_.readBuffer.data(), context_.readBuffer.size(), MSG_DONTWAIT);
-  if (count > 0) return process({context_.readBuffer.data(), static_cast<std::size_t>(count)});
+  if (count > 0) {
+    receivedBytes_ += static_cast<std::size_t>(count);
+    noteMemory();
+    return process({context_.readBuffer.data(), static_cast<std::size_t>(count)});
+  }
   if (count == 0) return end();
   if (errno == EINTR) return;
   if (errno == EAGAIN) {
@@ -116,6 +127,11 @@ void UnixConnection::process(std::string_view bytes) {
   }
   isPaused_ = true;
   rest_ = bytes;
+}
+
+// Of a connection that brought much, every request may be the one that ends what held it.
+void UnixConnection::noteMemory() {
+  if (context_.memory != nullptr && receivedBytes_ >= kMuchBytes) context_.memory->lookSoon();
 }
 
 void UnixConnection::dispatch(RpcFrame& frame) {

@@ -30,11 +30,12 @@ std::size_t descriptorsForClients() {
 }  // namespace
 
 UnixSocketListener::UnixSocketListener(std::unique_ptr<ServerSocket> socket, const LogCategory& log,
-                                       std::unique_ptr<WatchdogFeeder> watchdog, std::uint32_t owner)
+                                       std::unique_ptr<WatchdogFeeder> watchdog, std::uint32_t owner,
+                                       AllocatorReclaimer* memory)
     : socket_(std::move(socket)),
       log_(log),
       readBuffer_(kReadBytes),
-      context_{epoll_, waker_, texts_, readBuffer_, log_, owner},
+      context_{epoll_, waker_, texts_, readBuffer_, log_, owner, memory},
       watchdog_(std::move(watchdog)),
       mostConnections_(descriptorsForClients()) {}
 
