@@ -1,0 +1,21 @@
+# What the distribution builds its own programs with, as `DEB_BUILD_MAINT_OPTIONS=hardening=+all dpkg-buildflags` says it,
+# for every target: an overrun or a wrong index ends the process where it happens. Control-flow protection and the
+# library's assertions come on top. `scripts/check-hardening` compares this with the distribution, and reads it from the binaries.
+include(CheckPIESupported)
+check_pie_supported(LANGUAGES C CXX)
+set(CMAKE_POSITION_INDEPENDENT_CODE ON)
+# What only programs are linked from need not reckon with a symbol that another library replaces, which costs calls.
+add_compile_options($<$<STREQUAL:$<TARGET_PROPERTY:TYPE>,STATIC_LIBRARY>:-fPIE>)
+
+add_compile_options(-fstack-protector-strong -Wformat -Werror=format-security)
+# The C library refuses this one without optimisation. A package's own level stands.
+if(NOT "${CMAKE_C_FLAGS} ${CMAKE_CXX_FLAGS}" MATCHES "_FORTIFY_SOURCE")
+  add_compile_options($<$<CONFIG:Release,RelWithDebInfo,MinSizeRel>:-D_FORTIFY_SOURCE=2>)
+endif()
+add_compile_definitions($<$<COMPILE_LANGUAGE:CXX>:_GLIBCXX_ASSERTIONS>)
+if(CMAKE_SYSTEM_PROCESSOR MATCHES "^(x86_64|amd64|AMD64)$")
+  add_compile_options(-fcf-protection)
+elseif(CMAKE_SYSTEM_PROCESSOR MATCHES "^(aarch64|arm64)$")
+  add_compile_options(-mbranch-protection=standard)
+endif()
+add_link_options(-Wl,-z,relro -Wl,-z,now)
