@@ -1,0 +1,41 @@
+# Sourced by the scripts that try the packages of build/packages in a Debian of their own.
+
+# The suite that this runs on: the packages were built for it.
+suite() { (. /etc/os-release && echo "$VERSION_CODENAME"); }
+
+# Where this system has its packages from.
+mirror() {
+  apt-get indextargets --format '$(REPO_URI)' 'Created-By: Packages' "Codename: $(suite)" 'Component: main' | head -1
+}
+
+# names_of FILE...: what the packages are called, in one line.
+names_of() {
+  local file
+  for file in "$@"; do dpkg-deb --field "$file" Package; done | paste -sd' '
+}
+
+# dependencies_of FILE...: what the packages need besides each other, taking the first of alternatives.
+dependencies_of() {
+  local file
+  for file in "$@"; do dpkg-deb --field "$file" Pre-Depends Depends | sed 's/^[A-Za-z-]*: //' | tr ',' '\n'; done |
+    sed 's/|.*//; s/(.*//; s/ //g; /^$/d' | grep -vxF "$(names_of "$@" | tr ' ' '\n')" | sort -u | paste -sd,
+}
+
+# build_examples SYSROOT DIRECTORY: the example programs, by the commands that they name, against nothing but the packages
+# of the library, which are unpacked to SYSROOT; the programs go to DIRECTORY. Ends with the command that failed.
+build_examples() {
+  local sysroot=$1 directory=$2 file program command
+  mkdir -p "$sysroot"
+  for file in build/packages/libtwreporting*.deb; do dpkg-deb --extract "$file" "$sysroot"; done
+  for program in report.c report.cpp; do
+    command=$(sed -n 's|.*: \(c[c+]* report.*-pthread\).*|\1|p' examples/$program)
+    (
+      cd examples
+      export PKG_CONFIG_SYSROOT_DIR=$sysroot PKG_CONFIG_ALLOW_SYSTEM_CFLAGS=1 PKG_CONFIG_ALLOW_SYSTEM_LIBS=1
+      PKG_CONFIG_LIBDIR=$(echo "$sysroot"/usr/lib/*/pkgconfig)
+      export PKG_CONFIG_LIBDIR
+      set -f
+      eval "$command -o '$directory/$program.out'"
+    ) || { echo "examples/$program cannot be built by: $command"; return 1; }
+  done
+}

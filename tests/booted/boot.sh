@@ -1,0 +1,11 @@
+# The system is up, and of the daemon there is its socket alone.
+
+check 'the system comes up with nothing failed' says '^running$' systemctl is-system-running --wait
+check 'AppArmor holds the daemon to its profile' grep -qx 'twreportingd (enforce)' /sys/kernel/security/apparmor/profiles
+check 'the socket waits for the first client' is_in_state active twreportingd.socket
+check 'no daemon runs without a client' is_in_state inactive
+check 'the socket belongs to the daemon and the group audio' \
+  equal "$(stat --format '%U:%G %a' /run/tonewerk/reporting.sock)" 'tonewerk:audio 660'
+check 'its directories belong to them, too' \
+  equal "$(stat --format '%n %U:%G %a' /run/tonewerk /run/tonewerk/channels /run/tonewerk/notifications | paste -sd,)" \
+  '/run/tonewerk tonewerk:tonewerk 755,/run/tonewerk/channels tonewerk:audio 2775,/run/tonewerk/notifications tonewerk:audio 2775'

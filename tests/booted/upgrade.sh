@@ -1,0 +1,15 @@
+# A new version of the package on a running system, in which a configuration file that the device's owner has changed is
+# another one, too.
+
+export DEBIAN_FRONTEND=noninteractive
+before=$(daemon)
+check 'the new version installs' dpkg --install --force-confold /tests/upgrade.deb
+check 'the daemon that ran has ended' test ! -e "/proc/$before"
+check 'the new one runs or waits for its client' await twctl --system list
+check 'from the new file' eval '[ "/proc/$(daemon)/exe" -ef /usr/bin/twreportingd ]'
+check 'as the version that is installed' says upgrade dpkg-query --show tonewerk-reporting-daemon
+check "the owner's configuration is kept" grep -qx 'InternalBuild = true' /etc/tonewerk/device-facts.toml
+check "the maker's lies beside it" grep -qx '# A line of the new version.' /etc/tonewerk/device-facts.toml.dpkg-dist
+check 'the socket is served and belongs to the group' equal "$(stat --format '%U:%G %a' /run/tonewerk/reporting.sock)" 'tonewerk:audio 660'
+check 'what was stored is there' stored com.orvane.standalone.Playback.Start
+check "the user's socket waits" as player systemctl --user --quiet is-active twreportingd.socket
