@@ -3,6 +3,7 @@
 // The C++ interface: that it says what the C interface says, and that nothing is used after its end.
 #include <future>
 #include <gmock/gmock.h>
+#include <memory>
 #include <optional>
 
 #include "client/MessageFrame.h"
@@ -176,11 +177,12 @@ TEST_F(ReportingHppTest, LetsGoOfAReplyThatIsNotTaken) {
 
 TEST_F(ReportingHppTest, TellsWhoStillWaitsWhenTheClientGoes) {
   Later<Answer> stopped;
+  std::unique_ptr<ScriptedConnection> connection;  // which the daemon keeps
   {
     Client client = make();
     Session session(client, 77);
     ASSERT_EQ(session.start(stopped.setter()), Status::kOk);
-    const auto connection = daemon.accept();
+    connection = daemon.accept();
     ASSERT_TRUE(connection);
     connection->nextTexts(2);
   }
