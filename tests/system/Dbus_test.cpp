@@ -95,9 +95,9 @@ TEST_F(DbusTest, EveryRequestMayComeInTheOtherByteOrder) {
   EXPECT_EQ(caller.ask("GetAllReporters").body.size(), 16U);  // a length, padded, and an identifier
   caller.send("StartReportingSessionForID", "x", body().number64(kSession));
 
-  const auto content = [](int place) {
+  const auto content = [](std::uint32_t place) {
     return [place](DbusBytes& map) {
-      map.entry("place", "i").number32(static_cast<std::uint32_t>(place));
+      map.entry("place", "i").number32(place);
       map.entry("levels", "ad").array(8, [](DbusBytes& levels) { levels.real(0.5).real(-60); });
       map.entry("route", "a{sa{sv}}").array(8, [](DbusBytes& route) {
         route.align(8).string("port").array(8,
@@ -107,7 +107,7 @@ TEST_F(DbusTest, EveryRequestMayComeInTheOtherByteOrder) {
   };
   const auto nobody = [](DbusBytes&) {};
   const auto session = [](DbusBytes& identifiers) { identifiers.number64(kSession).number64(4711); };
-  for (int place = 0; place < 2; ++place) {
+  for (std::uint32_t place = 0; place < 2; ++place) {
     DbusBytes message = body();
     message.array(8, content(place)).number32(5).number16(5);
     place == 0 ? message.array(8, nobody) : message.array(8, session);
@@ -122,7 +122,7 @@ TEST_F(DbusTest, EveryRequestMayComeInTheOtherByteOrder) {
   ASSERT_TRUE(waitUntil([&] { return recorded.named(event).size() >= 2; }));
   const std::vector<nlohmann::json> events = recorded.named(event);
   ASSERT_THAT(events, SizeIs(2));
-  for (int place = 0; place < 2; ++place) {
+  for (std::uint32_t place = 0; place < 2; ++place) {
     EXPECT_EQ(events[place].at("place"), place);
     EXPECT_EQ(events[place].at("levels"), nlohmann::json::array({0.5, -60.0}));
     EXPECT_EQ(events[place].at("route").at("port").at("number"), 2);

@@ -44,7 +44,7 @@ TEST(ValueDigestTest, WhatOnlyLooksAlikeHasAnotherDigest) {
                                ValueArray(),
                                ValueArray({1}),
                                ValueArray({1, 1}),
-                               ValueArray({ValueArray()}),
+                               ValueArray{Value(ValueArray())},
                                ValueMap(),
                                ValueMap{{"v", 1}},
                                std::string(1, '\0'),
