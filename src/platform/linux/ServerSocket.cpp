@@ -142,9 +142,9 @@ std::unique_ptr<ServerSocket> ServerSocket::bound(const std::string& path, std::
 }
 
 void ServerSocket::noteFile(const std::string& path) {
-  struct stat made {};
-  if (path.empty() || ::lstat(path.c_str(), &made) != 0) return;
   path_ = path;
+  struct stat made {};
+  if (::lstat(path.c_str(), &made) != 0) return;  // gone already, so not in place
   device_ = made.st_dev;
   inode_ = made.st_ino;
 }

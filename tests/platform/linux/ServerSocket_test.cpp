@@ -146,11 +146,15 @@ TEST_F(ServerSocketTest, IsNotMadeAgainWhereAnotherProcessListensByNow) {
   EXPECT_TRUE(others->isInPlace());
 }
 
-// Runs in a child, whose descriptors are then systemd's to arrange: 0 when all was as it should be.
+// Runs in a child, whose descriptors are then systemd's to arrange.
+bool passAsSystemdDoes(int listening) {
+  return ::dup2(listening, 3) == 3 && ::setenv("LISTEN_PID", std::to_string(::getpid()).c_str(), 1) == 0 &&
+         ::setenv("LISTEN_FDS", "1", 1) == 0;
+}
+
+// 0 when all was as it should be.
 int takesThePassedSocket(int listening, const std::string& path, const std::string& ownPath) {
-  if (::dup2(listening, 3) != 3) return 10;
-  ::setenv("LISTEN_PID", std::to_string(::getpid()).c_str(), 1);
-  ::setenv("LISTEN_FDS", "1", 1);
+  if (!passAsSystemdDoes(listening)) return 10;
   std::string problem;
   auto socket = ServerSocket::open(ownPath, problem);
   if (socket == nullptr || socket->fileDescriptor() != 3) return 11;
@@ -168,17 +172,39 @@ int takesThePassedSocket(int listening, const std::string& path, const std::stri
   return std::filesystem::exists(path) ? 0 : 16;
 }
 
-TEST_F(ServerSocketTest, TakesTheSocketThatSystemdPassedAndLeavesItsFile) {
-  const FileDescriptor listening(::socket(AF_UNIX, SOCK_STREAM, 0));
-  const auto address = unixAddressOf(path);
-  ASSERT_EQ(::bind(listening.get(), generic(*address), sizeof(*address)), 0);
-  ASSERT_EQ(::listen(listening.get(), 5), 0);
-  const pid_t child = ::fork();
-  if (child == 0) ::_exit(takesThePassedSocket(listening.get(), path, directory.path("own.sock")));
-  int status = 0;
-  ASSERT_EQ(::waitpid(child, &status, 0), child);
-  ASSERT_TRUE(WIFEXITED(status));
-  EXPECT_EQ(WEXITSTATUS(status), 0);
+// 0 when a socket whose file went before it was taken counts as gone.
+int missesTheFile(int listening, const std::string& path, const std::string& ownPath) {
+  std::filesystem::remove(path);
+  if (!passAsSystemdDoes(listening)) return 10;
+  std::string problem;
+  const auto socket = ServerSocket::open(ownPath, problem);
+  if (socket == nullptr) return 11;
+  return socket->isInPlace() ? 12 : 0;
+}
+
+class PassedSocketTest : public ServerSocketTest {
+ protected:
+  PassedSocketTest() {
+    const auto address = unixAddressOf(path);
+    EXPECT_EQ(::bind(listening.get(), generic(*address), sizeof(*address)), 0);
+    EXPECT_EQ(::listen(listening.get(), 5), 0);
+  }
+  int statusOfChild(int (*run)(int, const std::string&, const std::string&)) const {
+    const pid_t child = ::fork();
+    if (child == 0) ::_exit(run(listening.get(), path, directory.path("own.sock")));
+    int status = 0;
+    EXPECT_EQ(::waitpid(child, &status, 0), child);
+    EXPECT_TRUE(WIFEXITED(status));
+    return WEXITSTATUS(status);
+  }
+
+  const FileDescriptor listening{::socket(AF_UNIX, SOCK_STREAM, 0)};
+};
+
+TEST_F(PassedSocketTest, IsTakenAndKeepsItsFile) { EXPECT_EQ(statusOfChild(takesThePassedSocket), 0); }
+
+TEST_F(PassedSocketTest, IsMissedWhereItsFileWentBeforeItWasTaken) {
+  EXPECT_EQ(statusOfChild(missesTheFile), 0);
 }
 
 }  // namespace
