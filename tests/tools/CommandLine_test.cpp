@@ -232,7 +232,7 @@ TEST_F(CommandLineTest, SendsToNobodyWhenAnIdentifierIsNobodys) {
   EXPECT_EQ(errors(), "twctl: no session has the identifier 8; the message was sent to none\n");
   EXPECT_EQ(run({"send", "--id", "7", "--id", "8", "--id", "0", "--category", "4", "--type", "1", "a=1"}),
             kRefused);
-  EXPECT_EQ(errors(), "twctl: no session has the identifier 8, 0; the message was sent to none\n");
+  EXPECT_EQ(errors(), "twctl: no session has any of the identifiers 8, 0; the message was sent to none\n");
   EXPECT_THAT(daemon().requestsFor("sendMessage"), IsEmpty());
 }
 

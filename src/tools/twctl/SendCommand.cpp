@@ -55,8 +55,8 @@ bool knowsAll(Tool& tool, Daemon& daemon, const std::vector<ReporterID>& reporte
       unknown += (unknown.empty() ? "" : ", ") + std::to_string(reporterID);
   }
   if (unknown.empty()) return true;
-  tool.status =
-      tool.fail(kRefused, "no session has the identifier " + unknown + "; the message was sent to none");
+  const char* which = unknown.find(',') == std::string::npos ? "the identifier " : "any of the identifiers ";
+  tool.status = tool.fail(kRefused, "no session has " + (which + unknown) + "; the message was sent to none");
   return false;
 }
 
