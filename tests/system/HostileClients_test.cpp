@@ -204,7 +204,9 @@ TEST_F(HostileClientsTest, AWellBehavedClientGetsItsResultsThroughout) {
   EXPECT_EQ(daemon.stop(), 0);
   const RecordedEvents events(daemon.storePath());
   EXPECT_EQ(events.integrity(), "ok");
-  const auto recorded = events.named("com.orvane.longformaudio.HearingHealth.AudioExposure");
+  auto recorded = events.named("com.orvane.longformaudio.HearingHealth.AudioExposure");
+  // A damaged message may be one for everybody's sessions.
+  std::erase_if(recorded, [](const auto& event) { return !event.contains("round"); });
   ASSERT_THAT(recorded, SizeIs(rounds));
   for (std::size_t at = 0; at < rounds; ++at) EXPECT_EQ(recorded[at].at("round"), at);
 }
