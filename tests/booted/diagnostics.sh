@@ -7,8 +7,13 @@ check 'leaking haptics and a silent alarm were captured' await has captures 2
 check 'a draft was made' await has drafts 1
 check 'an overload left a stall trace' await has whirlcaps 1
 check 'nothing of it was forbidden' eval '! grep -rE "ermission|EACCES|not permitted" /var/lib/tonewerk/{captures,issue-drafts,whirlcaps}/*/request.json'
-check 'each holds processes, load and the log' eval 'for folder in /var/lib/tonewerk/{captures,issue-drafts,whirlcaps}/*/; do
-  for file in processes.txt load.txt log.txt; do [ -s "$folder/$file" ] || { echo "$folder lacks $file"; exit 1; }; done; done'
+folders_are_complete() {
+  local folder file
+  for folder in /var/lib/tonewerk/{captures,issue-drafts,whirlcaps}/*/; do
+    for file in processes.txt load.txt log.txt; do [ -s "$folder/$file" ] || { echo "$folder lacks $file"; return 1; }; done
+  done
+}
+check 'each holds processes, load and the log' folders_are_complete
 check 'the memory log was taken' says 'WIRED LOG BLOCK' journalctl --boot --unit $unit --output cat
 check 'by its tool' says 'phys_footprint' journalctl --boot --unit $unit --output cat
 check 'beside what root wrote the daemon keeps its own' \

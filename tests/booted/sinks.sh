@@ -12,8 +12,13 @@ check 'real-time communication is stored' await has_rows rtc_message
 check 'and sent to the endpoint' await grep -q '^/v1/logs .*longformaudio' /tmp/received
 summaries() { find /var/log/tonewerk/Audio -type f -name '*.json'; }
 check 'a summary file is written' await eval '[ -n "$(summaries)" ]'
-check 'as JSON, for the group tonewerk' eval 'for file in $(summaries); do
-  python3 -m json.tool "$file" >/dev/null && [ "$(stat --format "%U:%G %a" "$file")" = "tonewerk:tonewerk 640" ] || exit 1; done'
+summaries_are_as_they_should_be() {
+  local file
+  for file in $(summaries); do
+    python3 -m json.tool "$file" >/dev/null && equal "$(stat --format '%U:%G %a' "$file")" 'tonewerk:tonewerk 640' || return 1
+  done
+}
+check 'as JSON, for the group tonewerk' summaries_are_as_they_should_be
 check 'the tools read each of them' eval 'twctl --system events | grep -q Volume && twctl --system power | grep -q Haptic &&
   twctl --system metrics | grep -q . && twctl --system rtc | grep -q .'
 
@@ -26,9 +31,9 @@ holder=$!
 check 'a session runs' await says '\b41\b' as player twctl --system list
 
 check 'the name of the device is written' twctl --system defaults write com.orvane.tonewerk device_name Kitchen
-check 'and the running session is told' await stored_with Kitchen
+check 'and the running session is told of the name' await stored_with Kitchen
 check 'a notification is posted by a member of the group' as player twctl --system notify post com.orvane.homedeck.ringerstate 1
-check 'and the running session is told' await stored_with '"ringerstate":true'
+check 'and the running session is told of it' await stored_with '"ringerstate":true'
 check 'nobody else posts' refuses as stranger twctl --system notify post com.orvane.homedeck.ringerstate 0
 
 twctl --system defaults delete com.orvane.tonewerk device_name
@@ -44,8 +49,17 @@ mv /run/tonewerk/channels/.amp.new /run/tonewerk/channels/amp.json
 pkill --parent $holder
 check 'what changed in them is reported when the session ends' await stored_with AmpDrv_Speaker_Simple_RailVolts
 
+# The examples' summaries, of which each program adds one.
+example_summaries() {
+  sqlite3 -readonly $store "SELECT count(*) FROM analytics_event
+    WHERE name = 'com.orvane.longformaudio.Volume.Summary' AND payload LIKE '%org.example.Report%'"
+}
+has_example_summaries() { [ "$(example_summaries)" -eq "$1" ]; }
+check 'no example has reported so far' has_example_summaries 0
+count=0
 for program in report.c report.cpp; do
+  count=$((count + 1))
   check "examples/$program reports" says 'report: done' as player env TONEWERK_REPORTING_SOCKET=/run/tonewerk/reporting.sock /tests/$program.out
+  check "and what examples/$program played is summed up" await has_example_summaries $count
 done
-check 'and what they sent is stored' await stored com.orvane.longformaudio.Performance.State
 kill $receiver

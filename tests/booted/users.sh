@@ -19,8 +19,8 @@ check "the user's bus has the daemon's name" await says '^b true' as player busc
   /com/orvane/tonewerk/reporting com.orvane.tonewerk.TWReportingServiceProtocol CreateReportingSession x 5
 check 'a preference is written and kept at home' eval 'as player twctl defaults write com.orvane.tonewerk.store max_days 7 &&
   [ "$(stat --format %U /home/player/.local/state/tonewerk/preferences/com.orvane.tonewerk.store.toml)" = player ]'
-check 'an example reports to it' says 'report: done' as player /tests/report.c.out
-check 'and is stored at home' await user_stored "name = 'com.orvane.longformaudio.Performance.State'"
+check 'an example reports to it, and prints the report that came of it' says 'Volume.Summary.*org.example.Report' as player /tests/report.c.out
+check 'from the store at home' user_stored "name = 'com.orvane.longformaudio.Volume.Summary' AND payload LIKE '%org.example.Report%'"
 
 # PipeWire is started by its socket; there is no sound card, so a sink of its own.
 check 'the bridge starts' user_unit enable --now --quiet tw-pipewire.service pipewire.service wireplumber.service
