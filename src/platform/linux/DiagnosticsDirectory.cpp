@@ -2,7 +2,6 @@
 #include "platform/linux/DiagnosticsDirectory.h"
 
 #include <algorithm>
-#include <cerrno>
 #include <cstdio>
 #include <fcntl.h>
 #include <filesystem>
@@ -61,14 +60,7 @@ std::error_code writeFile(const std::string& path, std::string_view text) {
   const FileDescriptor file(
       open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, kFileMode));
   if (!file) return lastSystemError();
-  while (!text.empty()) {
-    const ssize_t written = ::write(file.get(), text.data(), text.size());
-    if (written >= 0) {
-      text.remove_prefix(static_cast<std::size_t>(written));
-    } else if (errno != EINTR) {
-      return lastSystemError();
-    }
-  }
+  if (const std::error_code error = writeAll(file.get(), text)) return error;
   return fsync(file.get()) == 0 ? std::error_code() : lastSystemError();
 }
 

@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/DurableFile.h"
 
-#include <cerrno>
 #include <cstdio>
 #include <fcntl.h>
 #include <sys/stat.h>
@@ -13,16 +12,6 @@
 
 namespace tonewerk {
 namespace {
-
-std::error_code writeAll(int descriptor, std::string_view text) {
-  while (!text.empty()) {
-    const ssize_t written = write(descriptor, text.data(), text.size());
-    if (written < 0 && errno == EINTR) continue;
-    if (written < 0) return lastSystemError();
-    text.remove_prefix(static_cast<std::size_t>(written));
-  }
-  return {};
-}
 
 std::error_code writeSynced(int directory, const std::string& name, std::string_view text) {
   // What a crash left behind is of no use, and may not even be a file.

@@ -60,15 +60,7 @@ class JsonBenchfileWriter final : public BenchfileWriter {
 
  private:
   void flush() {
-    std::string_view rest = buffer_;
-    while (!rest.empty() && !error_) {
-      const ssize_t written = ::write(file_.get(), rest.data(), rest.size());
-      if (written >= 0) {
-        rest.remove_prefix(static_cast<std::size_t>(written));
-      } else if (errno != EINTR) {
-        error_ = lastSystemError();
-      }
-    }
+    if (!error_) error_ = writeAll(file_.get(), buffer_);
     buffer_.clear();
   }
 

@@ -53,18 +53,6 @@ std::error_code createDirectory(const std::string& path, mode_t mode) {
   return error == std::errc::file_exists ? std::make_error_code(std::errc::not_a_directory) : error;
 }
 
-std::error_code writeAll(int descriptor, std::string_view text) {
-  while (!text.empty()) {
-    const ssize_t written = ::write(descriptor, text.data(), text.size());
-    if (written >= 0) {
-      text.remove_prefix(static_cast<std::size_t>(written));
-    } else if (errno != EINTR) {
-      return lastSystemError();
-    }
-  }
-  return {};
-}
-
 // Renames without replacing anything.
 std::error_code renameToNew(int fromDirectory, const std::string& from, int directory,
                             const std::string& name) {

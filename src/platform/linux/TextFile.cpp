@@ -19,6 +19,18 @@ constexpr std::size_t kMostBytes = std::size_t{16} << 20;
 
 std::error_code lastSystemError() { return {errno, std::generic_category()}; }
 
+std::error_code writeAll(int descriptor, std::string_view text) {
+  while (!text.empty()) {
+    const ssize_t written = write(descriptor, text.data(), text.size());
+    if (written >= 0) {
+      text.remove_prefix(static_cast<std::size_t>(written));
+    } else if (errno != EINTR) {
+      return lastSystemError();
+    }
+  }
+  return {};
+}
+
 std::error_code readTextFile(const std::string& path, std::string& text) {
   const std::error_code error = readFileBytes(path, text);
   text = validUtf8(std::move(text));

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <string>
+#include <string_view>
 #include <sys/stat.h>
 #include <system_error>
 
@@ -15,6 +16,9 @@ namespace tonewerk {
 // The same of a file that somebody or something just filled with words: what is no UTF-8 in it reads as
 // U+FFFD. A process cut its name to 15 bytes, a card its own to as many as fit.
 [[nodiscard]] std::error_code readTextFile(const std::string& path, std::string& text);
+
+// All of `text`, in as many calls as it takes, into a descriptor that waits.
+[[nodiscard]] std::error_code writeAll(int descriptor, std::string_view text);
 
 // The error that the last failed system call of this thread left behind.
 std::error_code lastSystemError();
