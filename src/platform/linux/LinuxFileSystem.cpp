@@ -72,28 +72,15 @@ class HiddenFile final : public NewFile {
  public:
   // Null with `error` when the directory takes no file.
   static std::unique_ptr<HiddenFile> make(FileDescriptor directory, std::error_code& error) {
-    for (;;) {
-      std::string name = newHiddenName();
-      constexpr int kFlags = O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
-      FileDescriptor file(openat(directory.get(), name.c_str(), kFlags, kFileMode));
-      if (!file && errno == EEXIST) continue;
-      if (!file) {
-        error = lastSystemError();
-        return nullptr;
-      }
-      auto made = std::make_unique<HiddenFile>(std::move(directory), std::move(name), std::move(file));
-      if (made->isLocked()) return made;
-      directory = std::move(made->directory_);
-    }
+    auto made = std::make_unique<HiddenFile>(std::move(directory));
+    error = made->open();
+    return error ? nullptr : std::move(made);
   }
 
-  HiddenFile(FileDescriptor directory, std::string name, FileDescriptor file)
-      : directory_(std::move(directory)), hiddenName_(std::move(name)), file_(std::move(file)) {}
+  explicit HiddenFile(FileDescriptor directory) : directory_(std::move(directory)) {}
   HiddenFile(const HiddenFile&) = delete;
   HiddenFile& operator=(const HiddenFile&) = delete;
-  ~HiddenFile() override {
-    if (directory_ && !hiddenName_.empty()) unlinkat(directory_.get(), hiddenName_.c_str(), 0);
-  }
+  ~HiddenFile() override { remove(); }
 
   std::error_code write(std::string_view text) override {
     const std::error_code error = writeAll(file_.get(), text);
@@ -118,15 +105,48 @@ class HiddenFile final : public NewFile {
   }
 
  private:
-  // Another process that looks for leftovers may come between the making and the locking.
-  bool isLocked() const {
+  static constexpr int kMostAttempts = 8;
+
+  // Another process that looks for leftovers may come between the making and the locking; then another file
+  // is made. Who comes each time does not look for leftovers.
+  std::error_code open() {
+    for (int attempt = 0; attempt < kMostAttempts; ++attempt) {
+      const std::error_code error = create();
+      if (error && error != std::errc::file_exists) return error;
+      if (!error && lock()) return {};
+      remove();
+    }
+    return std::make_error_code(std::errc::resource_unavailable_try_again);
+  }
+
+  // Under a new name.
+  std::error_code create() {
+    std::string name = newHiddenName();
+    constexpr int kFlags = O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
+    file_ = FileDescriptor(openat(directory_.get(), name.c_str(), kFlags, kFileMode));
+    if (!file_) return lastSystemError();
+    hiddenName_ = std::move(name);
+    return {};
+  }
+
+  // False when somebody else has locked the file, or removed it.
+  //
+  // Some file systems lock nothing (shares in a network, those in user space). The file is written there all
+  // the same: who cannot lock takes nothing for a leftover either. Only where the system is out of locks for
+  // a moment may another process take it for one; then place() fails.
+  bool lock() {
+    if (flock(file_.get(), LOCK_EX | LOCK_NB) != 0) return errno != EWOULDBLOCK;
     struct stat status {};
-    return flock(file_.get(), LOCK_EX | LOCK_NB) == 0 && fstat(file_.get(), &status) == 0 &&
-           status.st_nlink > 0;
+    return fstat(file_.get(), &status) != 0 || status.st_nlink > 0;
+  }
+
+  void remove() {
+    if (!hiddenName_.empty()) unlinkat(directory_.get(), hiddenName_.c_str(), 0);
+    hiddenName_.clear();
   }
 
   FileDescriptor directory_;
-  std::string hiddenName_;  // empty once the file has its place
+  std::string hiddenName_;  // empty before the file is made, and once it has its place
   FileDescriptor file_;
   std::error_code failure_;
 };

@@ -14,7 +14,8 @@ namespace tonewerk {
 //
 // A new file is written beside its place under a hidden name, ".new-" and a number, with a lock on it that
 // its process's death ends. The first one in a directory removes what lies there under such names, is this
-// user's and has no lock: what processes left that were killed. So other processes may write there, too.
+// user's and has no lock: what processes left that were killed. So other processes may write there, too. A
+// file system without locks keeps what they left.
 class LinuxFileSystem final : public FileSystem {
  public:
   // What root makes belongs to whom the directory around it belongs to.

@@ -1,17 +1,23 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <algorithm>
+#include <cerrno>
 #include <csignal>
+#include <fcntl.h>
 #include <filesystem>
 #include <fstream>
 #include <gmock/gmock.h>
 #include <sstream>
 #include <string>
+#include <sys/file.h>
 #include <sys/stat.h>
+#include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
 #include <vector>
 
+#include "platform/linux/FileDescriptor.h"
 #include "platform/linux/LinuxFileSystem.h"
+#include "support/InterceptedCalls.h"
 #include "support/MemoryFileSystem.h"
 #include "support/SmallFileSystem.h"
 #include "support/TemporaryDirectory.h"
@@ -403,6 +409,83 @@ TEST(LinuxFileSystemTest, AFileThatFindsNoRoomIsNotPlaced) {
   EXPECT_EQ(file->write(std::string(std::size_t{2} << 20, 'x')), std::errc::no_space_on_device);
   EXPECT_EQ(file->place("a.json"), std::errc::no_space_on_device);
   file.reset();
+  EXPECT_THAT(namesIn(directory.path()), IsEmpty());
+}
+
+// Something that comes between the file system and the kernel.
+class LinuxFileSystemCallTest : public testing::Test {
+ protected:
+  void SetUp() override {
+    const bool isPossible = runIntercepted(SYS_flock, nullptr, [] {});
+    if (!isPossible) GTEST_SKIP() << "system calls cannot be intercepted here";
+  }
+  // Makes a.json with the text "text", while `handle` is asked about each of the calls of `number`. What
+  // fails is in `error`.
+  void write(long number, const InterceptedCallHandler& handle) {
+    ASSERT_TRUE(runIntercepted(number, handle, [this] {
+      LinuxFileSystem files;
+      const auto file = files.createFile(directory.path(), "a.json", error);
+      if (file != nullptr) error = file->write("text");
+      if (file != nullptr && !error) error = file->place("a.json");
+    }));
+  }
+  // Of the only file in the directory; none when another has it.
+  FileDescriptor lockOnlyFile() const {
+    const std::vector<std::string> names = namesIn(directory.path());
+    EXPECT_EQ(names.size(), 1U);
+    FileDescriptor file(open(directory.path(names.at(0)).c_str(), O_RDONLY | O_CLOEXEC));
+    EXPECT_TRUE(file);
+    if (flock(file.get(), LOCK_EX | LOCK_NB) != 0) file.reset();
+    return file;
+  }
+
+  // More often than this no call is made to fail, so that no defect makes a test endless.
+  static constexpr int kMostCalls = 100;
+  TemporaryDirectory directory;
+  std::error_code error;
+  int calls = 0;
+};
+
+// Once it made files without end where none can be locked.
+TEST_F(LinuxFileSystemCallTest, WritesWhereNoFileCanBeLockedAndLeavesLeftovers) {
+  std::ofstream(directory.path(".new-1")) << "left";
+  for (const int failure : {ENOLCK, EOPNOTSUPP}) {
+    calls = 0;
+    write(SYS_flock, [&](const seccomp_data&) { return ++calls <= kMostCalls ? failure : 0; });
+    EXPECT_FALSE(error) << error.message();
+    EXPECT_EQ(calls, 2);  // the leftover's and the file's
+    EXPECT_THAT(namesIn(directory.path()), ElementsAre(".new-1", "a.json"));
+    EXPECT_EQ(OnDisk::contents(directory.path("a.json")), "text");
+    std::filesystem::remove(directory.path("a.json"));
+  }
+}
+
+TEST_F(LinuxFileSystemCallTest, MakesAnotherFileForOneThatSomebodyLockedFirst) {
+  FileDescriptor held;
+  write(SYS_flock, [&](const seccomp_data&) {
+    if (++calls == 1) held = lockOnlyFile();
+    return 0;
+  });
+  EXPECT_TRUE(held);
+  EXPECT_EQ(calls, 2);
+  EXPECT_FALSE(error) << error.message();
+  EXPECT_THAT(namesIn(directory.path()), ElementsAre("a.json"));
+}
+
+TEST_F(LinuxFileSystemCallTest, MakesAnotherFileForOneThatWasRemovedBeforeItWasLocked) {
+  write(SYS_flock, [&](const seccomp_data&) {
+    if (++calls == 1) std::filesystem::remove(directory.path(namesIn(directory.path()).at(0)));
+    return 0;
+  });
+  EXPECT_EQ(calls, 2);
+  EXPECT_FALSE(error) << error.message();
+  EXPECT_THAT(namesIn(directory.path()), ElementsAre("a.json"));
+}
+
+TEST_F(LinuxFileSystemCallTest, GivesUpWhereSomebodyLocksEveryNewFile) {
+  write(SYS_flock, [&](const seccomp_data&) { return ++calls <= kMostCalls ? EWOULDBLOCK : 0; });
+  EXPECT_EQ(error, std::errc::resource_unavailable_try_again);
+  EXPECT_LT(calls, kMostCalls);
   EXPECT_THAT(namesIn(directory.path()), IsEmpty());
 }
 
