@@ -151,12 +151,14 @@ class HiddenFile final : public NewFile {
   std::error_code failure_;
 };
 
-// Whether nobody writes the file any more. Ours alone: what others put there is theirs.
-bool isLeftover(int directory, const char* name) {
+// Removes a file that nobody writes any more. Ours alone: what others put there is theirs. The lock is held
+// meanwhile, so that who has just made the file sees it gone when the lock is free.
+void removeIfLeftover(int directory, const char* name) {
   const FileDescriptor file(openat(directory, name, O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
   struct stat status {};
-  return file && fstat(file.get(), &status) == 0 && S_ISREG(status.st_mode) && status.st_uid == geteuid() &&
-         flock(file.get(), LOCK_EX | LOCK_NB) == 0;
+  const bool isLeftover = file && fstat(file.get(), &status) == 0 && S_ISREG(status.st_mode) &&
+                          status.st_uid == geteuid() && flock(file.get(), LOCK_EX | LOCK_NB) == 0;
+  if (isLeftover) unlinkat(directory, name, 0);
 }
 
 std::error_code copyAll(int from, int to) {
@@ -231,9 +233,7 @@ void LinuxFileSystem::removeLeftovers(const std::string& path, int directory) {
   std::error_code error;  // a directory that cannot be read keeps what it has
   for (std::filesystem::directory_iterator at(path, error), end; !error && at != end; at.increment(error)) {
     const std::string name = at->path().filename().string();
-    if (name.starts_with(kHiddenPrefix) && isLeftover(directory, name.c_str())) {
-      unlinkat(directory, name.c_str(), 0);
-    }
+    if (name.starts_with(kHiddenPrefix)) removeIfLeftover(directory, name.c_str());
   }
 }
 

@@ -489,5 +489,18 @@ TEST_F(LinuxFileSystemCallTest, GivesUpWhereSomebodyLocksEveryNewFile) {
   EXPECT_THAT(namesIn(directory.path()), IsEmpty());
 }
 
+// Else another process may lock it in between, and writes into a file that is gone.
+TEST_F(LinuxFileSystemCallTest, ALeftoverIsLockedUntilItIsRemoved) {
+  std::ofstream(directory.path(".new-1")) << "left";
+  write(SYS_unlinkat, [&](const seccomp_data&) {
+    ++calls;
+    EXPECT_FALSE(lockOnlyFile());
+    return 0;
+  });
+  EXPECT_EQ(calls, 1);
+  EXPECT_FALSE(error) << error.message();
+  EXPECT_THAT(namesIn(directory.path()), ElementsAre("a.json"));
+}
+
 }  // namespace
 }  // namespace tonewerk
