@@ -17,10 +17,11 @@ class NewFile {
   // All of `text`, or an error. After one the file can be written to, but is never whole.
   [[nodiscard]] virtual std::error_code write(std::string_view text) = 0;
 
-  // Ends the writing: the file stands under `name` in its directory, and what was written is on the disk.
+  // Ends the writing: the file stands under `name` in its directory, and name and text are on the disk.
   // Once, but again after std::errc::file_exists (something stands there, which stays as it is). Other
   // failures: the first one of a write(), a name that createFile() would refuse, what the operating system
-  // only finds out at the end.
+  // only finds out at the end; where that is that the name cannot be brought to the disk, the whole file
+  // stands there all the same.
   [[nodiscard]] virtual std::error_code place(const std::string& name) = 0;
 };
 

@@ -94,14 +94,11 @@ class HiddenFile final : public NewFile {
     // Else a crash of the system could leave the name with half of the text, or none, behind it.
     if (fsync(file_.get()) != 0) return failure_ = lastSystemError();
     std::error_code error = renameToNew(directory_.get(), hiddenName_, directory_.get(), name);
-    if (error == kCannotKeep) {
-      const bool isLinked =
-          linkat(directory_.get(), hiddenName_.c_str(), directory_.get(), name.c_str(), 0) == 0;
-      error = isLinked ? std::error_code() : lastSystemError();
-      if (isLinked) unlinkat(directory_.get(), hiddenName_.c_str(), 0);
-    }
-    if (!error) hiddenName_.clear();
-    return error;
+    if (error == kCannotKeep) error = moveByLink(name);
+    if (error) return error;
+    hiddenName_.clear();
+    // The name is in the directory, which is a file of its own.
+    return fsync(directory_.get()) == 0 ? std::error_code() : lastSystemError();
   }
 
  private:
@@ -140,6 +137,14 @@ class HiddenFile final : public NewFile {
     return fstat(file_.get(), &status) != 0 || status.st_nlink > 0;
   }
 
+  std::error_code moveByLink(const std::string& name) {
+    if (linkat(directory_.get(), hiddenName_.c_str(), directory_.get(), name.c_str(), 0) != 0)
+      return lastSystemError();
+    remove();
+    return {};
+  }
+
+  // The hidden name, and with it the file unless it has another one.
   void remove() {
     if (!hiddenName_.empty()) unlinkat(directory_.get(), hiddenName_.c_str(), 0);
     hiddenName_.clear();

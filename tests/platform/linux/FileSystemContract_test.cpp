@@ -502,5 +502,45 @@ TEST_F(LinuxFileSystemCallTest, ALeftoverIsLockedUntilItIsRemoved) {
   EXPECT_THAT(namesIn(directory.path()), ElementsAre("a.json"));
 }
 
+// Else a crash of the system may take the name away again, though the text is on the disk.
+TEST_F(LinuxFileSystemCallTest, AFileWhoseNameIsNotOnTheDiskIsAFailure) {
+  write(SYS_fsync, [&](const seccomp_data& call) {
+    const std::string file = "/proc/self/fd/" + std::to_string(call.args[0]);
+    if (!std::filesystem::equivalent(file, directory.path())) return 0;
+    ++calls;
+    EXPECT_THAT(namesIn(directory.path()), ElementsAre("a.json"));
+    return EIO;
+  });
+  EXPECT_EQ(calls, 1);
+  EXPECT_EQ(error, std::errc::io_error);
+  EXPECT_EQ(OnDisk::contents(directory.path("a.json")), "text");
+}
+
+// Some file systems rename only over what stands there.
+TEST_F(LinuxFileSystemCallTest, AFileIsPlacedWithALinkWhereARenameWouldReplace) {
+  write(SYS_renameat2, [&](const seccomp_data&) {
+    ++calls;
+    return EINVAL;
+  });
+  EXPECT_EQ(calls, 1);
+  EXPECT_FALSE(error) << error.message();
+  EXPECT_THAT(namesIn(directory.path()), ElementsAre("a.json"));
+  EXPECT_EQ(OnDisk::contents(directory.path("a.json")), "text");
+}
+
+TEST_F(LinuxFileSystemCallTest, ALinkReplacesNothingAndAnotherNameMayBeTried) {
+  const auto refuse = [](const seccomp_data&) { return EINVAL; };
+  ASSERT_TRUE(runIntercepted(SYS_renameat2, refuse, [this] {
+    LinuxFileSystem files;
+    const auto file = files.createFile(directory.path(), "a.json", error);
+    ASSERT_NE(file, nullptr);
+    std::ofstream(directory.path("a.json")) << "faster";
+    EXPECT_EQ(file->place("a.json"), std::errc::file_exists);
+    EXPECT_FALSE(file->place("b.json"));
+  }));
+  EXPECT_THAT(namesIn(directory.path()), ElementsAre("a.json", "b.json"));
+  EXPECT_EQ(OnDisk::contents(directory.path("a.json")), "faster");
+}
+
 }  // namespace
 }  // namespace tonewerk
