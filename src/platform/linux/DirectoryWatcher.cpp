@@ -107,7 +107,9 @@ void DirectoryWatcher::handle(const Event& event) {
   if (!isOverflow && !isAncestor && event.watch != directoryWatch_) return;  // of a watch given up since
 
   const bool isSelf = (event.what & (kSelfEvents | IN_IGNORED)) != 0;
-  if (isOverflow || isSelf || (isAncestor && event.name == awaited_)) {
+  // A changed mode matters only as long as the directory could not be read.
+  const bool mayMatter = (event.what & IN_ATTRIB) == 0 || directoryWatch_ < 0;
+  if (isOverflow || isSelf || (isAncestor && event.name == awaited_ && mayMatter)) {
     // What was lost with an overflow may be a change of the directory itself.
     attach();
     onEverything_();

@@ -15,6 +15,7 @@
 #include <vector>
 
 #include "support/MemoryLog.h"
+#include "support/Stranger.h"
 #include "support/TemporaryDirectory.h"
 
 namespace tonewerk {
@@ -292,6 +293,13 @@ TEST_F(WatchedDirectoryTest, WhatHappensBesideTheDirectoryIsNotTold) {
   EXPECT_THAT(toldSoFar(), IsEmpty());
 }
 
+// It is one event of the directory above, and queued every handler though nothing was posted.
+TEST_F(WatchedDirectoryTest, AChangedModeOfAWatchedDirectoryTellsNothing) {
+  fs::permissions(watched, fs::perms::owner_all);
+  fs::last_write_time(watched, fs::file_time_type::clock::now());
+  EXPECT_THAT(toldSoFar(), IsEmpty());
+}
+
 TEST_F(WatchedDirectoryTest, ADirectoryThatIsRemovedAndMadeAgainIsFollowed) {
   for (int round = 0; round < 3; ++round) {
     fs::remove_all(watched);
@@ -412,6 +420,20 @@ TEST_F(DirectoryWatcherTest, ADirectoryThatMayNotBeReadIsLoggedOnce) {
   EXPECT_THAT(log.textsOf("twrs", LogLevel::kError),
               ::testing::ElementsAre("cannot watch " + watched + ": Permission denied"));
   fs::permissions(watched, fs::perms::owner_all);
+}
+
+TEST_F(DirectoryWatcherTest, ADirectoryThatBecomesReadableIsFollowed) {
+  if (geteuid() != 0) GTEST_SKIP() << "only root can watch as somebody else";
+  constexpr auto kEverybodys = static_cast<fs::perms>(0755);
+  fs::create_directories(watched);
+  fs::permissions(root.path(), kEverybodys);
+  fs::permissions(parent, kEverybodys);
+  fs::permissions(watched, fs::perms::owner_all);
+  runAsStranger([this] { watch(); });  // the watcher's thread is one, too
+  fs::permissions(watched, kEverybodys);
+  EXPECT_TRUE(waitFor(kEverything));
+  write(path("a"));
+  EXPECT_TRUE(waitFor("a"));
 }
 
 }  // namespace
