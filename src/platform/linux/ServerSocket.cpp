@@ -33,19 +33,30 @@ std::string directoryOf(const std::string& path) {
   return directory.empty() ? "." : directory;
 }
 
+// What becomes of who finds the directory locked: flock()'s operations.
+constexpr int kWait = LOCK_EX;
+constexpr int kDoNotWait = LOCK_EX | LOCK_NB;
+
 // Held while the socket's file is looked at and replaced or removed, so that of two daemons that start
 // together one sees the other. Nothing is held when the directory cannot be opened; what follows then fails
 // by itself.
 class DirectoryLock {
  public:
-  explicit DirectoryLock(const std::string& path)
+  DirectoryLock(const std::string& path, int operation)
       : directory_(::open(directoryOf(path).c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC)) {
-    while (directory_ && ::flock(directory_.get(), LOCK_EX) != 0 && errno == EINTR) {
-    }
+    int result = 0;
+    do {
+      result = directory_ ? ::flock(directory_.get(), operation) : 0;
+    } while (result != 0 && errno == EINTR);
+    isOthers_ = result != 0 && errno == EWOULDBLOCK;
   }
+
+  // Whether another process has the lock and was not waited for.
+  bool isOthers() const { return isOthers_; }
 
  private:
   FileDescriptor directory_;
+  bool isOthers_ = false;
 };
 
 // "name (pid)" of the process behind the other end of a connected socket.
@@ -95,7 +106,7 @@ bool clear(const std::string& path, const sockaddr_un& address, std::string& pro
 
 std::unique_ptr<ServerSocket> ServerSocket::open(const std::string& path, std::string& problem) {
   if (auto passed = fromSystemd()) return passed;
-  return bound(path, problem);
+  return bound(path, kWait, problem);
 }
 
 std::unique_ptr<ServerSocket> ServerSocket::fromSystemd() {
@@ -113,7 +124,8 @@ std::unique_ptr<ServerSocket> ServerSocket::fromSystemd() {
   return nullptr;
 }
 
-std::unique_ptr<ServerSocket> ServerSocket::bound(const std::string& path, std::string& problem) {
+std::unique_ptr<ServerSocket> ServerSocket::bound(const std::string& path, int lockOperation,
+                                                  std::string& problem) {
   const std::optional<sockaddr_un> address = unixAddressOf(path);
   if (!address) {
     problem = "a socket's path cannot be \"" + path + "\"";
@@ -126,7 +138,11 @@ std::unique_ptr<ServerSocket> ServerSocket::bound(const std::string& path, std::
     return nullptr;
   }
 
-  const DirectoryLock lock(path);
+  const DirectoryLock lock(path, lockOperation);
+  if (lock.isOthers()) {
+    problem = directoryOf(path) + " is locked by another process";
+    return nullptr;
+  }
   if (!clear(path, *address, problem)) return nullptr;
   auto socket = std::unique_ptr<ServerSocket>(new ServerSocket(newSocket()));
   const int descriptor = socket->fileDescriptor();
@@ -165,13 +181,15 @@ std::unique_ptr<ServerSocket> ServerSocket::madeAgain(std::string& problem) cons
     problem = path_ + " went with its directory, and comes back with it";
     return nullptr;
   }
-  return bound(path_, problem);
+  // Everybody who may read the directory may lock it for as long as they like, and clients wait meanwhile.
+  return bound(path_, kDoNotWait, problem);
 }
 
 ServerSocket::~ServerSocket() {
-  if (path_.empty() || isSystemds_) return;
-  const DirectoryLock lock(path_);
-  if (isInPlace()) ::unlink(path_.c_str());
+  if (path_.empty() || isSystemds_ || !isInPlace()) return;
+  // What stays because somebody else has the lock is replaced by the next daemon.
+  const DirectoryLock lock(path_, kDoNotWait);
+  if (!lock.isOthers() && isInPlace()) ::unlink(path_.c_str());
 }
 
 }  // namespace tonewerk

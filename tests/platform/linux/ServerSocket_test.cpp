@@ -7,13 +7,16 @@
 #include <fstream>
 #include <gmock/gmock.h>
 #include <string>
+#include <sys/file.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
+#include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include "platform/linux/RawClient.h"
 #include "platform/linux/UnixAddress.h"
+#include "support/InterceptedCalls.h"
 #include "support/TemporaryDirectory.h"
 
 namespace tonewerk {
@@ -31,6 +34,13 @@ class ServerSocketTest : public testing::Test {
     const auto address = unixAddressOf(path);
     ASSERT_EQ(::bind(dead.get(), generic(*address), sizeof(*address)), 0);
     ASSERT_EQ(::listen(dead.get(), 1), 0);
+  }
+
+  // What another process that locks the socket's directory has; as little can be had beside it.
+  FileDescriptor lockOfAnother() const {
+    FileDescriptor lock(::open(directory.path().c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+    EXPECT_EQ(::flock(lock.get(), LOCK_EX | LOCK_NB), 0);
+    return lock;
   }
 
   TemporaryDirectory directory;
@@ -144,6 +154,46 @@ TEST_F(ServerSocketTest, IsNotMadeAgainWhereAnotherProcessListensByNow) {
   EXPECT_EQ(socket->madeAgain(problem), nullptr);
   EXPECT_THAT(problem, HasSubstr("is in use by"));
   EXPECT_TRUE(others->isInPlace());
+}
+
+// Once whoever held the directory's lock held the messaging thread, too.
+TEST_F(ServerSocketTest, IsNotMadeAgainWhileAnotherProcessLocksTheDirectory) {
+  const auto socket = open();
+  ASSERT_NE(socket, nullptr);
+  std::filesystem::remove(path);
+  FileDescriptor others = lockOfAnother();
+  EXPECT_EQ(socket->madeAgain(problem), nullptr);
+  EXPECT_EQ(problem, directory.path() + " is locked by another process");
+  EXPECT_FALSE(std::filesystem::exists(path));
+
+  others.reset();
+  EXPECT_NE(socket->madeAgain(problem), nullptr);
+}
+
+TEST_F(ServerSocketTest, LeavesItsFileToTheNextOneWhileAnotherProcessLocksTheDirectory) {
+  auto socket = open();
+  ASSERT_NE(socket, nullptr);
+  FileDescriptor others = lockOfAnother();
+  socket = nullptr;
+  EXPECT_TRUE(std::filesystem::exists(path));
+
+  others.reset();
+  EXPECT_NE(open(), nullptr) << problem;
+}
+
+TEST_F(ServerSocketTest, LocksNothingToLeaveAFileThatIsNotItsOwn) {
+  auto socket = open();
+  ASSERT_NE(socket, nullptr);
+  std::filesystem::remove(path);
+  int locks = 0;
+  const auto count = [&locks](const seccomp_data&) {
+    ++locks;
+    return 0;
+  };
+  if (!runIntercepted(SYS_flock, count, [&] { socket = nullptr; })) {
+    GTEST_SKIP() << "system calls cannot be intercepted here";
+  }
+  EXPECT_EQ(locks, 0);
 }
 
 // Runs in a child, whose descriptors are then systemd's to arrange.

@@ -4,17 +4,21 @@
 #include <atomic>
 #include <chrono>
 #include <cstdint>
+#include <fcntl.h>
+#include <filesystem>
 #include <future>
 #include <gmock/gmock.h>
 #include <memory>
 #include <optional>
 #include <string>
+#include <sys/file.h>
 #include <sys/resource.h>
 #include <sys/stat.h>
 #include <thread>
 #include <unistd.h>
 #include <vector>
 
+#include "platform/linux/FileDescriptor.h"
 #include "platform/linux/Hex.h"
 #include "platform/linux/MessagingRig.h"
 #include "platform/linux/RawClient.h"
@@ -277,6 +281,27 @@ TEST_F(UnixSocketListenerTest, EndsAConnectionThatSendsNonsenseAndServesTheOther
   // What came before the nonsense has been done.
   EXPECT_EQ(record.requests().back().arguments, Arguments{Value(5)});
   expectServed(good);
+}
+
+TEST_F(UnixSocketListenerTest, ServesItsClientsWhileAnotherProcessLocksTheSocketsDirectory) {
+  RawClient client(path);
+  expectServed(client);
+  FileDescriptor others(::open(directory.path().c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  ASSERT_EQ(::flock(others.get(), LOCK_EX | LOCK_NB), 0);
+  std::filesystem::remove(path);
+  listener->restoreSocket();
+  // The second round comes after the one in which the socket was to be made again.
+  expectServed(client);
+  expectServed(client);
+  EXPECT_THAT(errorLines(),
+              ElementsAre("clients cannot connect: " + directory.path() + " is locked by another process"));
+
+  others.reset();
+  listener->restoreSocket();
+  expectServed(client);
+  expectServed(client);
+  RawClient next(path);
+  expectServed(next);
 }
 
 TEST_F(UnixSocketListenerTest, EndsAConnectionThatSendsAResponse) {
