@@ -57,6 +57,19 @@ const char* problemOfType(std::string_view& types) {
   }
 }
 
+// What the library's own check finds wrong with a text of that kind, as it continues "argument 1 (message) ".
+// It takes the strings that isText() takes, and does not tell one that it refuses from one that is cut off.
+const char* problemOfText(char kind) {
+  switch (kind) {
+    case SD_BUS_TYPE_OBJECT_PATH:
+      return "holds a malformed object path";
+    case SD_BUS_TYPE_SIGNATURE:
+      return "holds a malformed signature";
+    default:
+      return "holds text that is not UTF-8 or has a noncharacter";
+  }
+}
+
 // Reads values up to the first thing that is wrong; then problem() says what it is, as it continues "argument
 // 1 (message) ", and everything read since is worthless.
 class ValueReader {
@@ -120,8 +133,7 @@ class ValueReader {
     const char* text = nullptr;
     const int result = sd_bus_message_read_basic(message_, kind, &text);
     if (result <= 0 || text == nullptr) {
-      // The library's own check; what isText() takes, it takes.
-      result == -EBADMSG ? fail("holds text that is not UTF-8 or has a noncharacter") : malformed();
+      result == -EBADMSG ? fail(problemOfText(kind)) : malformed();
       return {};
     }
     const std::string_view view(text);

@@ -152,6 +152,27 @@ TEST(DbusArgumentsTest, RefusesTheTextsThatTheSocketRefuses) {
   }
 }
 
+// They were told of as text that is not UTF-8, too.
+TEST(DbusArgumentsTest, NamesAPathOrASignatureThatIsMalformed) {
+  DbusBytes path;
+  path.array(8, [](DbusBytes& map) { map.entry("path", "o").string("no/path"); });
+  DbusBytes cutPath;
+  cutPath.array(8, [](DbusBytes& map) { map.entry("path", "o").number32(1000); });
+  DbusBytes signature;
+  signature.array(8, [](DbusBytes& map) { map.entry("signature", "g").signature("(i"); });
+  DbusBytes cutSignature;
+  cutSignature.array(8, [](DbusBytes& map) { map.entry("signature", "g").byte(100); });
+  const std::string argument = "TakeMap: argument 1 (map) ";
+  for (const auto& [body, what] : {std::pair(path, "object path"),
+                                   {cutPath, "object path"},
+                                   {signature, "signature"},
+                                   {cutSignature, "signature"}}) {
+    const std::optional<DbusArguments> read = ReadingEnd().read(messageOf("a{sv}", body.text()));
+    ASSERT_TRUE(read && read->problem) << what;
+    EXPECT_EQ(*read->problem, messagingError(kInvalidArguments, argument + "holds a malformed " + what));
+  }
+}
+
 TEST(DbusArgumentsTest, TakesTheTextsBesideThem) {
   for (const char* text : {"\xEF\xBF\xBD", "\xEF\xB7\x8F", "\xEF\xB7\xB0", "\xF0\x9F\xBF\xBD",
                            "\xF0\x90\x80\x80", "\xEE\xBF\xBF"}) {
