@@ -10,6 +10,7 @@
 #include "platform/linux/AllocatorReclaimer.h"
 #include "platform/linux/RawClient.h"
 #include "platform/linux/RpcLimits.h"
+#include "system/memory/Sanitizers.h"
 #include "system/support/DaemonTest.h"
 #include "system/support/Packed.h"
 
@@ -19,14 +20,6 @@ namespace {
 constexpr ReporterID kSession = 77;
 constexpr AudioServiceType kLongFormAudio = 7;
 constexpr std::size_t kMegabyte = std::size_t{1} << 20;
-
-#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-constexpr bool kHasSanitizer = true;
-#elif defined(__has_feature)
-constexpr bool kHasSanitizer = __has_feature(address_sanitizer) || __has_feature(thread_sanitizer);
-#else
-constexpr bool kHasSanitizer = false;
-#endif
 
 // What an idle daemon may have more than before: what the allocator is left with, and as much for caches that
 // have filled meanwhile.

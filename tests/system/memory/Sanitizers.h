@@ -1,0 +1,15 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+namespace tonewerk {
+
+// Whether this program, and the daemon built with it, has a sanitizer's allocator, which keeps what it has.
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+inline constexpr bool kHasSanitizer = true;
+#elif defined(__has_feature)
+inline constexpr bool kHasSanitizer = __has_feature(address_sanitizer) || __has_feature(thread_sanitizer);
+#else
+inline constexpr bool kHasSanitizer = false;
+#endif
+
+}  // namespace tonewerk
