@@ -110,7 +110,7 @@ class Daemon {
         service_(TWReportingService::make([this] { endOnKillRequest(); })),
         listener_(std::move(socket), log, watchdogOf(manager, linux.clock()), ::geteuid(), &linux.memory()),
         dbusListener_(dbusNames(), TWReportingServiceExport::exportedInterface(),
-                      dbusAddressFromEnvironment(), log) {
+                      dbusAddressFromEnvironment(), log, &linux.memory()) {
     diagnostics_.removeLeftovers();  // the socket is ours, so no other daemon writes there
     // Asked for now, so that device facts that are read again later change nothing about it.
     hasSignposts_ = context_.isInternalBuild() && isTracingBuiltIn();

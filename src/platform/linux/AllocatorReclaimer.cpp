@@ -80,6 +80,12 @@ AllocatorReclaimer::~AllocatorReclaimer() {
   looks_->timer = nullptr;
 }
 
+// Who brought it does not matter: many small clients leave as much behind as a large one, and what one of
+// them brought may be held by another's session.
+void AllocatorReclaimer::clientBrought(std::size_t bytes) {
+  if (broughtBytes_.fetch_add(bytes, std::memory_order_relaxed) + bytes >= kMuchBytes) lookSoon();
+}
+
 void AllocatorReclaimer::lookSoon() {
   // Mostly it is asked for already, and reading costs least.
   if (looks_->isAskedFor.load(std::memory_order_relaxed)) return;

@@ -1,8 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <atomic>
 #include <chrono>
 #include <cstddef>
+#include <cstdint>
 #include <functional>
 #include <memory>
 
@@ -24,13 +26,17 @@ struct Allocator {
 // Gives memory back to the system that the allocator would keep for good: what a large session held when it
 // has ended, what unfinished frames held when their connections have gone.
 //
-// Nobody has to know when that is. Who brings much, or ends what held much, asks for looks at the allocator:
-// 1, 2, 4 ... 32 seconds later, since the store and the files may still be writing what a session had. After
-// the last look nothing runs until somebody asks again.
+// Nobody has to know when that is. Once clients have brought much, all of them together, whatever one of them
+// sends may be what ends a large session, and so may its end. So each of both asks for looks at the
+// allocator: 1, 2, 4 ... 32 seconds later, since the store and the files may still be writing what a session
+// had. After the last look nothing runs until somebody asks again.
 class AllocatorReclaimer {
  public:
   // What the allocator may keep: less is soon used again.
   static constexpr std::size_t kSpareBytes = std::size_t{16} << 20;
+  // What clients may bring in the daemon's life before anybody looks. A frame that never ends may hold forty
+  // times its bytes, so that this can leave little more than the allocator may keep.
+  static constexpr std::size_t kMuchBytes = std::size_t{512} << 10;
   static constexpr std::chrono::seconds kFirstLook{1};
   static constexpr int kLastLook = 32;
 
@@ -40,13 +46,16 @@ class AllocatorReclaimer {
   AllocatorReclaimer& operator=(const AllocatorReclaimer&) = delete;
   ~AllocatorReclaimer();
 
-  // Any thread. Costs next to nothing while looks are under way; when these are done, all of them follow once
-  // more.
+  // Any thread, all three. They cost next to nothing while looks are under way; when these are done, all of
+  // them follow once more.
+  void clientBrought(std::size_t bytes);
+  void clientWent() { clientBrought(0); }
   void lookSoon();
 
  private:
   struct Looks;
 
+  std::atomic<std::uint64_t> broughtBytes_ = 0;
   const std::shared_ptr<Looks> looks_;  // a tick that is running may outlive us
 };
 

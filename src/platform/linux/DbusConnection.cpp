@@ -7,6 +7,7 @@
 #include <utility>
 
 #include "platform/LogLine.h"
+#include "platform/linux/AllocatorReclaimer.h"
 #include "platform/linux/DbusAnswer.h"
 
 namespace tonewerk {
@@ -32,7 +33,10 @@ DbusConnection::DbusConnection(const DbusConnectionContext& context, std::uint64
       load_(std::make_shared<RequestLoad>(context.waker, identifier)),
       outbox_(std::make_shared<DbusOutbox>(context.waker, identifier)) {}
 
-DbusConnection::~DbusConnection() { outbox_->close(); }
+DbusConnection::~DbusConnection() {
+  outbox_->close();
+  if (context_.memory != nullptr) context_.memory->clientWent();
+}
 
 std::string DbusConnection::description() const {
   const std::string user = peer_.userIdentifier == kNoUser ? "unknown" : std::to_string(peer_.userIdentifier);
@@ -56,6 +60,7 @@ std::optional<ReplyError> DbusConnection::take(sd_bus_message* call, const DbusI
   }
   const Method& method = context_.interface.methodOf(entry);
   DbusArguments read = readDbusArguments(call, entry, method, context_.texts);
+  if (context_.memory != nullptr) context_.memory->clientBrought(read.wireBytes);
   if (read.problem) return std::move(read.problem);
   RequestToken token = load_->start(bytesHeldBy(read) + method.replyBytes);
   handOver({entry.place, std::move(read.arguments), replyTo(call, method.result.type), std::move(token)});

@@ -21,6 +21,8 @@
 
 namespace tonewerk {
 
+class AllocatorReclaimer;
+
 // What the clients on one bus share.
 struct DbusConnectionContext {
   const DbusInterface& interface;
@@ -28,6 +30,7 @@ struct DbusConnectionContext {
   std::shared_ptr<IoWaker> waker;
   RpcTexts& texts;
   const LogCategory& log;
+  AllocatorReclaimer* memory;  // told of what clients bring, and of their ends; may be null
 };
 
 // Who is behind a name on the bus, as the bus says.

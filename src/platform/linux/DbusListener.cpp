@@ -14,8 +14,12 @@
 namespace tonewerk {
 
 DbusListener::DbusListener(DbusNames names, const ExportedInterface& methods, std::string address,
-                           const LogCategory& log)
-    : names_(std::move(names)), address_(std::move(address)), log_(log), interface_(methods) {}
+                           const LogCategory& log, AllocatorReclaimer* memory)
+    : names_(std::move(names)),
+      address_(std::move(address)),
+      log_(log),
+      interface_(methods),
+      memory_(memory) {}
 
 DbusListener::~DbusListener() { shutDown(); }
 
@@ -35,7 +39,7 @@ void DbusListener::shutDown() {
 
 void DbusListener::run() {
   nameThisThread("tw-dbus");
-  const DbusConnectionContext context{interface_, *delegate_, waker_, texts_, log_};
+  const DbusConnectionContext context{interface_, *delegate_, waker_, texts_, log_, memory_};
   while (!isStopping_) {
     const auto start = std::chrono::steady_clock::now();
     {

@@ -29,9 +29,10 @@ class DbusListener final : public MessagingListener {
   static constexpr std::chrono::milliseconds kLongestPause{60'000};
 
   // `methods` and `log` outlive the listener; delegates export objects of these methods. `address` is a D-Bus
-  // address, empty for the system's bus.
-  DbusListener(DbusNames names, const ExportedInterface& methods, std::string address,
-               const LogCategory& log);
+  // address, empty for the system's bus. `memory`, which outlives the listener, is told of what clients
+  // bring, and of their ends.
+  DbusListener(DbusNames names, const ExportedInterface& methods, std::string address, const LogCategory& log,
+               AllocatorReclaimer* memory = nullptr);
   ~DbusListener() override;
 
   void setDelegate(MessagingListenerDelegate& delegate) override { delegate_ = &delegate; }
@@ -48,6 +49,7 @@ class DbusListener final : public MessagingListener {
   const std::string address_;
   const LogCategory& log_;
   const DbusInterface interface_;
+  AllocatorReclaimer* const memory_;
   MessagingListenerDelegate* delegate_ = nullptr;
   const std::shared_ptr<IoWaker> waker_ = std::make_shared<IoWaker>();
 

@@ -14,9 +14,6 @@
 namespace tonewerk {
 namespace {
 
-// Received in a connection's life, this is much: a frame that never ends may hold forty times its bytes.
-constexpr std::size_t kMuchBytes = std::size_t{512} << 10;
-
 // Of a method that nobody knows, in the answer that says so.
 constexpr std::size_t kMostMethodNameBytes = 64;
 
@@ -57,7 +54,7 @@ UnixConnection::UnixConnection(const UnixConnectionContext& context, std::uint64
 
 UnixConnection::~UnixConnection() {
   outbox_->close();
-  noteMemory();
+  if (context_.memory != nullptr) context_.memory->clientWent();
 }
 
 std::string UnixConnection::description() const {
@@ -95,9 +92,9 @@ void UnixConnection::receive() {
   const ssize_t count =
       ::recv(socket_.get(), context_.readBuffer.data(), context_.readBuffer.size(), MSG_DONTWAIT);
   if (count > 0) {
-    receivedBytes_ += static_cast<std::size_t>(count);
-    noteMemory();
-    return process({context_.readBuffer.data(), static_cast<std::size_t>(count)});
+    const auto bytes = static_cast<std::size_t>(count);
+    if (context_.memory != nullptr) context_.memory->clientBrought(bytes);
+    return process({context_.readBuffer.data(), bytes});
   }
   if (count == 0) return end();
   if (errno == EINTR) return;
@@ -127,11 +124,6 @@ void UnixConnection::process(std::string_view bytes) {
   }
   isPaused_ = true;
   rest_ = bytes;
-}
-
-// Of a connection that brought much, every request may be the one that ends what held it.
-void UnixConnection::noteMemory() {
-  if (context_.memory != nullptr && receivedBytes_ >= kMuchBytes) context_.memory->lookSoon();
 }
 
 void UnixConnection::dispatch(RpcFrame& frame) {

@@ -31,7 +31,7 @@ struct UnixConnectionContext {
   std::span<char> readBuffer;
   const LogCategory& log;
   std::uint32_t owner;         // who may use what is for the daemon's own user
-  AllocatorReclaimer* memory;  // told of connections that bring much; may be null
+  AllocatorReclaimer* memory;  // told of what clients bring, and of their ends; may be null
 };
 
 // One client's socket, on the I/O thread.
@@ -71,7 +71,6 @@ class UnixConnection final : public MessagingConnection {
   std::optional<ReplyError> problemWithFrame(const RpcFrame& frame, std::optional<std::size_t> method) const;
   void endAsBroken(std::string_view problem);
   void updateInterest();
-  void noteMemory();
   bool hasRoom() { return load_->hasRoom(outbox_->unsentBytes()); }
 
   const UnixConnectionContext& context_;
@@ -88,7 +87,6 @@ class UnixConnection final : public MessagingConnection {
   bool hasEnded_ = false;
 
   RpcFrameReader reader_;
-  std::size_t receivedBytes_ = 0;
   std::shared_ptr<RequestLoad> load_;
   bool isPaused_ = false;
   std::string rest_;

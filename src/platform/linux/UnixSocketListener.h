@@ -38,7 +38,7 @@ class UnixSocketListener final : public MessagingListener {
 
   // `log` outlives the listener. The messaging thread feeds `watchdog`; without one it wakes up for clients
   // alone. `owner` is the user who, beside root, may use what is for the daemon's own. `memory`, which
-  // outlives the listener, is told of connections that bring much, and of their ends.
+  // outlives the listener, is told of what clients bring, and of their ends.
   UnixSocketListener(std::unique_ptr<ServerSocket> socket, const LogCategory& log,
                      std::unique_ptr<WatchdogFeeder> watchdog = nullptr, std::uint32_t owner = ::geteuid(),
                      AllocatorReclaimer* memory = nullptr);

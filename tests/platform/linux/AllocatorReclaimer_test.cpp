@@ -93,5 +93,23 @@ TEST_F(AllocatorReclaimerTest, LooksBeginAnewForWhoAsksLater) {
   EXPECT_THAT(looksWithin(3), ElementsAre(1, 2));
 }
 
+TEST_F(AllocatorReclaimerTest, LooksForWhatClientsBringOnceItIsMuchForAllTogether) {
+  reclaimer.clientBrought(AllocatorReclaimer::kMuchBytes - 1);
+  reclaimer.clientWent();
+  EXPECT_EQ(timers.count(), 0U);
+  reclaimer.clientBrought(1);
+  EXPECT_EQ(timers.count(), 1U);
+}
+
+// Of what they brought, another's session may hold the most, and end by a request of a few bytes.
+TEST_F(AllocatorReclaimerTest, LooksAgainForWhateverClientsDoAfterTheyHaveBroughtMuch) {
+  reclaimer.clientBrought(AllocatorReclaimer::kMuchBytes);
+  clock.advance(1000.0);
+  reclaimer.clientBrought(1);
+  EXPECT_THAT(looksWithin(100), ElementsAre(1, 2, 4, 8, 16, 32));
+  reclaimer.clientWent();
+  EXPECT_THAT(looksWithin(100), ElementsAre(1, 2, 4, 8, 16, 32));
+}
+
 }  // namespace
 }  // namespace tonewerk

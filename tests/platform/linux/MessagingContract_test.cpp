@@ -7,12 +7,15 @@
 #include <unistd.h>
 #include <vector>
 
+#include "platform/linux/AllocatorReclaimer.h"
 #include "platform/linux/DbusCaller.h"
 #include "platform/linux/DbusListener.h"
 #include "platform/linux/DbusValues.h"
 #include "platform/linux/MessagingRig.h"
 #include "platform/linux/PrivateBus.h"
 #include "platform/linux/UnixSocketListener.h"
+#include "support/ManualClock.h"
+#include "support/ManualTimers.h"
 #include "support/MemoryLog.h"
 #include "support/MemoryMessaging.h"
 #include "support/TemporaryDirectory.h"
@@ -69,11 +72,12 @@ class SocketSide {
   using Texts = PlainTexts;
   static constexpr bool kKnowsOwnersMethods = true;
 
-  explicit SocketSide(MessagingListenerDelegate& delegate) {
+  explicit SocketSide(MessagingListenerDelegate& delegate, AllocatorReclaimer* memory = nullptr) {
     std::string problem;
     auto socket = ServerSocket::open(path_, problem);
     EXPECT_NE(socket, nullptr) << problem;
-    listener_ = std::make_unique<UnixSocketListener>(std::move(socket), category_);
+    listener_ =
+        std::make_unique<UnixSocketListener>(std::move(socket), category_, nullptr, ::geteuid(), memory);
     listener_->setDelegate(delegate);
     listener_->resume();
   }
@@ -118,8 +122,8 @@ class DbusSide {
   };
   static constexpr bool kKnowsOwnersMethods = false;
 
-  explicit DbusSide(MessagingListenerDelegate& delegate)
-      : listener_(kNames, rigInterface(), bus_.address(), category_) {
+  explicit DbusSide(MessagingListenerDelegate& delegate, AllocatorReclaimer* memory = nullptr)
+      : listener_(kNames, rigInterface(), bus_.address(), category_, memory) {
     listener_.setDelegate(delegate);
     listener_.resume();
   }
@@ -138,6 +142,7 @@ class DbusSide {
   }
   void notify(std::string_view method, const Arguments& arguments) {
     caller_->sendWithoutAnswer(callOf(method, arguments));
+    EXPECT_GE(sd_bus_flush(caller_->bus()), 0);
   }
   std::vector<Answer> answers(std::size_t count) {
     EXPECT_TRUE(caller_->waitForReceived(count));
@@ -370,6 +375,49 @@ TYPED_TEST(MessagingContractTest, LetsRepliesAfterShuttingDownGoNowhere) {
   held[0].first(std::nullopt, Value("late"));
   held.clear();
   EXPECT_THAT(this->record.events(), SizeIs(4));
+}
+
+// What every listener to other processes tells the reclaimer, of which a timer exists while there are looks.
+template <typename Side>
+class ReclaimingContractTest : public testing::Test {
+ protected:
+  ManualClock clock;
+  ManualTimers timers{clock};
+  AllocatorReclaimer memory{timers, {[] { return std::size_t{0}; }, [] {}}};
+  MessagingRecord record;
+  RigDelegate delegate{record};
+  Side side{delegate, &memory};
+};
+
+using SidesOfProcesses = testing::Types<SocketSide, DbusSide>;
+TYPED_TEST_SUITE(ReclaimingContractTest, SidesOfProcesses);
+
+// Many small clients leave as much behind as a large one, and none of them brought much itself.
+TYPED_TEST(ReclaimingContractTest, AsksForLooksOnceClientsHaveBroughtMuchTogether) {
+  constexpr std::size_t kClients = 5;
+  const std::string text(AllocatorReclaimer::kMuchBytes / kClients, 'x');
+  for (std::size_t client = 1; client <= kClients; ++client) {
+    EXPECT_EQ(this->timers.count(), 0U);
+    this->side.connect();
+    this->side.notify("takeMap", {Value(ValueMap{{"text", text}})});
+    ASSERT_TRUE(this->record.waitForRequests(client));
+    if (client == kClients) break;
+    this->side.disconnect();
+    ASSERT_TRUE(this->record.waitForEvents(4 * client));
+  }
+  EXPECT_EQ(this->timers.count(), 1U);
+}
+
+TYPED_TEST(ReclaimingContractTest, AsksForLooksAtAClientsEnd) {
+  this->memory.clientBrought(AllocatorReclaimer::kMuchBytes);
+  this->side.connect();
+  ASSERT_TRUE(this->record.waitForEvents(1));
+  this->clock.advance(100.0);  // what was asked for so far
+  ASSERT_EQ(this->timers.count(), 0U);
+  this->side.disconnect();
+  ASSERT_TRUE(this->record.waitForEvents(4));
+  this->side.shutDown();
+  EXPECT_EQ(this->timers.count(), 1U);
 }
 
 }  // namespace
