@@ -58,7 +58,8 @@ extern "C" {
 
 typedef enum twr_status {
   TWR_OK = 0,
-  TWR_INVALID = 1,   /* an argument that cannot be: NULL, text that is none, an unbalanced payload */
+  TWR_INVALID = 1,   /* an argument that cannot be: NULL, text that is not valid (see twr_put_text), an
+                        unbalanced payload */
   TWR_TOO_LARGE = 2, /* does not fit into the payload's memory, the ring or the protocol's frame (1 MiB) */
   TWR_FULL = 3,      /* no room in the queue or the ring: dropped, and counted where it was a message */
   TWR_NO_MEMORY = 4,
@@ -282,10 +283,10 @@ TWR_API twr_status twr_session_set_configuration(twr_session* session, const twr
  */
 TWR_API twr_status twr_session_start(twr_session* session, twr_reply stopped, void* context);
 /*
- * A message that finds the queue full is dropped (TWR_FULL). The first that goes out of what the session or
- * one of its senders says after that tells how many were, under "twreporting_dropped"; where none follows,
- * one with nothing else does when the session stops. A message is stamped with the time of this call, unless
- * it holds "twreporting_timestamp" (seconds since 1970, a double).
+ * A message that finds no room in the queue is dropped (TWR_FULL). The first that goes out of what the
+ * session or one of its senders says after that tells how many were, under "twreporting_dropped"; where none
+ * follows, one with nothing else does when the session stops. A message is stamped with the time of this
+ * call, unless it holds "twreporting_timestamp" (seconds since 1970, a double).
  */
 TWR_API twr_status twr_session_send(twr_session* session, uint32_t category, uint16_t type,
                                     const twr_payload* payload, twr_reply reply, void* context);
@@ -330,7 +331,7 @@ TWR_API uint64_t twr_sender_dropped(const twr_sender* sender);
 /*
  * What lies in the ring still goes out, in its place, as what twr_session_send() was given: where no daemon
  * takes it at once it moves to the client's queue, if there is none yet as well as after a connection broke;
- * what finds the queue full is dropped, the newest first, counted and told. Not for real-time threads.
+ * each message that finds no room in the queue is dropped, counted and told. Not for real-time threads.
  */
 TWR_API void twr_sender_close(twr_sender* sender);
 

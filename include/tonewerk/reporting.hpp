@@ -151,7 +151,7 @@ struct Date {
 // ---- payloads ----
 
 // What a payload of any size can do: every call puts one entry and gives the payload back for the next. What
-// does not fit, or is no text, marks the payload, which is then refused as a whole. For any thread, a
+// does not fit, or is not valid text, marks the payload, which is then refused as a whole. For any thread, a
 // real-time one, too; one at a time.
 class AnyPayload {
  public:

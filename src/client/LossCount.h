@@ -29,7 +29,7 @@ class LossCount {
 // How many of them the messages that go out have told.
 struct ToldLosses {
   std::uint64_t counted = 0;  // of the count
-  std::uint64_t late = 0;     // beside it, and yet to be told: taken at first, and lost afterwards
+  std::uint64_t late = 0;     // messages that were taken first and lost later; not part of the count
 
   bool owes(std::uint64_t lostBefore) const { return late > 0 || lostBefore > counted; }
   // What a message tells before which so many were lost.
