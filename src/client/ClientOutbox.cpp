@@ -17,7 +17,7 @@ constexpr std::size_t kLeastReplies = 64;
 
 // What a message counts for in the queue.
 std::size_t bytesOf(std::size_t payloadBytes, std::size_t reporterIDs) {
-  return Command::kOverheadBytes + payloadBytes + kMessageFrameBytes + reporterIDs * kReporterIDBytes;
+  return kCommandBytes + payloadBytes + kMessageFrameBytes + reporterIDs * kReporterIDBytes;
 }
 
 // A session's message that is to be kept.
@@ -88,7 +88,7 @@ twr_status ClientOutbox::change(twr_session& session, SessionChange change, Pend
   Command command;
   command.kind = Command::Kind::kChange;
   command.session = session.shared_from_this();
-  command.bytes = Command::kOverheadBytes + change.configuration.bytes() + markBytes(session);
+  command.bytes = kCommandBytes + change.configuration.bytes() + markBytes(session);
   command.change = std::make_unique<SessionChange>(std::move(change));
   session.wanted = std::move(wanted);
 
@@ -141,7 +141,7 @@ twr_status ClientOutbox::request(std::string body, PendingReply reply) {
   if (hasEnded_) return TWR_NOT_CONNECTED;
   Command command;
   command.kind = Command::Kind::kRequest;
-  command.bytes = Command::kOverheadBytes + body.size();
+  command.bytes = kCommandBytes + body.size();
   if (!queue_.hasRoomForChange(command.bytes) || (reply && !acceptReply(false))) return TWR_FULL;
   command.body = std::move(body);
   command.reply = reply;

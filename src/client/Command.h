@@ -48,9 +48,6 @@ struct Command {
     kBarrier,    // nothing; tells `waiter` that all before it has gone out
   };
 
-  // What a command takes in memory next to its bytes, roughly.
-  static constexpr std::size_t kOverheadBytes = 128;
-
   Kind kind = Kind::kMessage;
   std::shared_ptr<twr_session> session;  // null for the client's own
   RingMessage message{};
@@ -66,5 +63,8 @@ struct Command {
   std::uint64_t lostBefore = 0;  // of the session, when it was asked for
   std::uint64_t lostAfter = 0;   // of messages that were taken, and would have come next
 };
+
+// What a command takes in memory next to what it points at: with its place in the queue's list.
+inline constexpr std::size_t kCommandBytes = sizeof(Command) + 2 * sizeof(void*);
 
 }  // namespace tonewerk

@@ -305,8 +305,20 @@ TEST_F(ClientOutboxTest, IgnoresAnAnswerToNothing) {
   EXPECT_THAT(told(), IsEmpty());
 }
 
+// Else a queue of small requests holds a multiple of its bound.
+TEST_F(ClientOutboxTest, CountsTheMemoryOfWhatWaitsAndNotOnlyItsBytes) {
+  const auto one = session();
+  const std::size_t ofTheSession = outbox->queuedBytes();
+  EXPECT_GE(ofTheSession, sizeof(Command));
+  EXPECT_EQ(outbox->request("", {}), TWR_OK);
+  const std::size_t ofTheRequest = outbox->queuedBytes() - ofTheSession;
+  EXPECT_GE(ofTheRequest, sizeof(Command));
+  EXPECT_EQ(send(*one, 1), TWR_OK);
+  EXPECT_GE(outbox->queuedBytes() - ofTheSession - ofTheRequest, sizeof(Command) + payload.size);
+}
+
 TEST_F(ClientOutboxTest, DropsMessagesPastItsBoundAndSaysHowMany) {
-  makeOutbox(600);
+  makeOutbox(1000);
   const auto one = session();
   int sent = 0;
   while (send(*one, sent) == TWR_OK) ++sent;
@@ -321,7 +333,7 @@ TEST_F(ClientOutboxTest, DropsMessagesPastItsBoundAndSaysHowMany) {
 }
 
 TEST_F(ClientOutboxTest, CountsWhatWasDroppedOfASessionForThatSessionAlone) {
-  makeOutbox(600);
+  makeOutbox(1000);
   const auto one = session();
   const auto other = session(78);
   while (send(*one, 1) == TWR_OK) {
@@ -333,7 +345,7 @@ TEST_F(ClientOutboxTest, CountsWhatWasDroppedOfASessionForThatSessionAlone) {
 }
 
 TEST_F(ClientOutboxTest, KeepsRoomForChangesBeyondMessages) {
-  makeOutbox(600);
+  makeOutbox(1000);
   const auto one = session();
   while (send(*one, 1) == TWR_OK) {
   }
@@ -344,7 +356,8 @@ TEST_F(ClientOutboxTest, KeepsRoomForChangesBeyondMessages) {
 
 TEST_F(ClientOutboxTest, BringsAboutWhatFoundNoRoom) {
   const auto one = session();
-  while (outbox->queuedBytes() < 65536 + CommandQueue::kReserveBytes - 100) outbox->change(*one, type(1), {});
+  while (outbox->queuedBytes() < 65536 + CommandQueue::kReserveBytes - kCommandBytes)
+    outbox->change(*one, type(1), {});
   EXPECT_EQ(outbox->change(*one, type(9), {}), TWR_OK);
   EXPECT_EQ(outbox->change(*one, configuration({{"a", 1}}), {}), TWR_OK);
   EXPECT_EQ(outbox->change(*one, make(Kind::kStart), reply("start")), TWR_FULL);
@@ -360,7 +373,8 @@ TEST_F(ClientOutboxTest, BringsAboutWhatFoundNoRoom) {
 
 TEST_F(ClientOutboxTest, ForgetsASessionThatCameAndWentWhileThereWasNoRoom) {
   const auto one = session();
-  while (outbox->queuedBytes() < 65536 + CommandQueue::kReserveBytes - 100) outbox->change(*one, type(1), {});
+  while (outbox->queuedBytes() < 65536 + CommandQueue::kReserveBytes - kCommandBytes)
+    outbox->change(*one, type(1), {});
   const std::size_t before = outbox->queuedBytes();
   for (int at = 0; at < 10'000; ++at) EXPECT_EQ(outbox->destroy(*session(78), {}), TWR_OK);
   EXPECT_EQ(outbox->queuedBytes(), before);
@@ -474,7 +488,7 @@ TEST_F(ClientOutboxTest, KeepsWhatAClosedSenderLeavesWithoutADaemonInItsPlace) {
 TEST_F(ClientOutboxTest, KeepsOfAClosedSenderWhatTheQueueHasRoomForAndTellsTheRestAtItsPlace) {
   for (const bool wasConnected : {false, true}) {
     SCOPED_TRACE(wasConnected ? "a connection broke" : "there was none yet");
-    makeOutbox(2200);
+    makeOutbox(2800);
     const auto one = session();
     if (wasConnected) outbox->connected();
     const auto sender = outbox->openSender(*one, hasForked, 4096);
