@@ -274,8 +274,11 @@ void ClientOutbox::encodeMessage(Command command) {
 }
 
 void ClientOutbox::encodeLoss(Command command) {
-  command.session->told.owes(command.lostBefore) ? encodeMessage(std::move(command))
-                                                 : passOver(std::move(command));
+  if (command.session->told.owes(command.lostBefore)) {
+    encodeMessage(std::move(command));
+  } else {
+    passOver(std::move(command));
+  }
 }
 
 // One that says nothing, but has its place among the others.
@@ -476,7 +479,11 @@ void ClientOutbox::drainQuietRings() {
   // Only then: what one of them has lost may lie between what others have said.
   for (std::size_t at = 0; at < senders_.size();) {
     const std::shared_ptr<twr_sender> sender = senders_[at];
-    sender->isClosed&& isQuiet(*sender) ? finish(*sender) : static_cast<void>(++at);
+    if (sender->isClosed && isQuiet(*sender)) {
+      finish(*sender);  // takes it out of senders_
+    } else {
+      ++at;
+    }
   }
 }
 
