@@ -7,6 +7,7 @@
 #include <sys/prctl.h>
 #include <vector>
 
+#include "support/OtlpReceiver.h"
 #include "system/support/DaemonTest.h"
 #include "system/support/RecordedEvents.h"
 
@@ -14,6 +15,9 @@ namespace tonewerk {
 namespace {
 
 using nlohmann::json;
+using ::testing::Contains;
+using ::testing::IsEmpty;
+using ::testing::Not;
 using ::testing::SizeIs;
 
 constexpr ReporterID kSession = 77;
@@ -39,11 +43,13 @@ class ProcessName {
   char before_[16] = {};
 };
 
-// On internal builds, where every session has its summary file.
+// On internal builds, where every session has its summary file, and with an endpoint in the network.
 class ProcessNamesTest : public DaemonTest {
  protected:
   void SetUp() override {
     ASSERT_TRUE(daemon.writeConfiguration("device-facts.toml", "InternalBuild = true\n"));
+    ASSERT_TRUE(daemon.writeConfiguration("preferences/com.orvane.linkreport.toml",
+                                          "backends = ['" + receiver.address() + "']\n"));
     ASSERT_TRUE(daemon.start());
   }
 
@@ -66,6 +72,8 @@ class ProcessNamesTest : public DaemonTest {
     }));
     return file;
   }
+
+  OtlpReceiver receiver;
 };
 
 TEST_F(ProcessNamesTest, ANameThatIsCutInACharacterIsTextInEverythingThatComesOfTheSession) {
@@ -96,6 +104,28 @@ TEST_F(ProcessNamesTest, ANameThatIsCutInACharacterIsTextInEverythingThatComesOf
     return false;
   }));
   EXPECT_EQ(summaryFile().back().at("Session_Generic_Summary_1").at("clientProcessName"), kNameAsText);
+}
+
+// Which take nothing but UTF-8, and would refuse the whole batch for one name.
+TEST_F(ProcessNamesTest, ANameThatIsCutInACharacterIsTextInWhatAnEndpointGets) {
+  const ProcessName name(kName);
+  {
+    DaemonClient client = connect();
+    client.create(kSession);
+    client.start(kSession);
+    client.send({{"a", 1}}, 4, kTypeStart, {kSession});
+    client.stop(kSession);
+  }
+  EXPECT_EQ(daemon.stop(), 0);  // with everything sent
+  ASSERT_THAT(receiver.requests(), Not(IsEmpty()));
+  ASSERT_THAT(receiver.problems(), IsEmpty());
+  std::vector<json> attributes;
+  for (const json& record : receiver.records()) {
+    const json& some = record.at("attributes");
+    attributes.insert(attributes.end(), some.begin(), some.end());
+  }
+  const json expected{{"key", "clientProcessName"}, {"value", {{"stringValue", kNameAsText}}}};
+  EXPECT_THAT(attributes, Contains(expected));
 }
 
 }  // namespace
