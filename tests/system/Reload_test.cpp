@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // Signals that ask the daemon for something, and preference files that are written while it runs.
+#include <algorithm>
 #include <filesystem>
 #include <signal.h>
 #include <string>
@@ -70,6 +71,30 @@ TEST_F(ReloadTest, ConsumersAreReadAgainAtOnce) {
   const auto events = RecordedEvents(daemon.storePath()).named(kEvent);
   ASSERT_EQ(events.size(), 2U);
   EXPECT_EQ(events[1].at("number"), 3);
+}
+
+TEST_F(ReloadTest, BackendsAreThoseOfTheTimeAtWhichASessionStarted) {
+  start();
+  const RecordedEvents recorded(daemon.storePath());
+  DaemonClient client = connect();
+  client.create(kSession, kLongFormAudio);
+  client.start(kSession);
+  ASSERT_TRUE(waitUntil([&] { return recorded.rtcSessions().size() == 1; }));
+  ASSERT_TRUE(daemon.writeConfiguration("preferences/com.orvane.linkreport.toml", "backends = []\n"));
+  reload();
+  client.create(kSession + 1, kLongFormAudio);
+  client.start(kSession + 1);
+  ASSERT_TRUE(waitForLogLine("no backends found, this session won't get sent to the server"));
+  client.send({{"number", 1}}, 4, kTypeStart, {kSession, kSession + 1});
+  EXPECT_EQ(daemon.stop(), 0);  // with everything written
+
+  const auto sessions = recorded.rtcSessions();
+  ASSERT_EQ(sessions.size(), 1U);
+  EXPECT_EQ(sessions[0].at("TWReportingSessionID"), kSession);
+  const auto messages = recorded.rtcMessages();
+  EXPECT_EQ(std::count_if(messages.begin(), messages.end(),
+                          [](const auto& message) { return message.value("number", nlohmann::json()) == 1; }),
+            1);
 }
 
 TEST_F(ReloadTest, AnIdleDaemonKeepsToANewBoundOfTheStore) {

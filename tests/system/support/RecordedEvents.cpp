@@ -17,15 +17,24 @@ struct Close {
   void operator()(sqlite3_stmt* statement) const { sqlite3_finalize(statement); }
 };
 
+std::vector<nlohmann::json> parsed(const std::vector<std::string>& texts) {
+  std::vector<nlohmann::json> found;
+  for (const std::string& text : texts) found.push_back(nlohmann::json::parse(text, nullptr, false));
+  return found;
+}
+
 }  // namespace
 
 std::vector<nlohmann::json> RecordedEvents::named(const std::string& name) const {
-  std::vector<nlohmann::json> found;
-  for (const std::string& text :
-       texts("SELECT payload FROM analytics_event WHERE name = ? ORDER BY id", name)) {
-    found.push_back(nlohmann::json::parse(text, nullptr, false));
-  }
-  return found;
+  return parsed(texts("SELECT payload FROM analytics_event WHERE name = ? ORDER BY id", name));
+}
+
+std::vector<nlohmann::json> RecordedEvents::rtcSessions() const {
+  return parsed(texts("SELECT user_info FROM rtc_session ORDER BY id"));
+}
+
+std::vector<nlohmann::json> RecordedEvents::rtcMessages() const {
+  return parsed(texts("SELECT payload FROM rtc_message ORDER BY id"));
 }
 
 std::vector<std::string> RecordedEvents::names() const {

@@ -17,6 +17,10 @@ class RecordedEvents {
   std::vector<nlohmann::json> named(const std::string& name) const;
   // The names of all events, oldest first.
   std::vector<std::string> names() const;
+  // What the sessions told the local backend of themselves, and the payloads of what they sent to it, oldest
+  // first.
+  std::vector<nlohmann::json> rtcSessions() const;
+  std::vector<nlohmann::json> rtcMessages() const;
   // What the database itself finds wrong with it; "ok" when nothing is.
   std::string integrity() const;
 
