@@ -88,6 +88,7 @@ std::optional<Number> numberNamed(const std::vector<Named<Number>>& all, std::st
 template <typename Number>
 std::vector<std::string> namesOf(const std::vector<Named<Number>>& all) {
   std::vector<std::string> names;
+  names.reserve(all.size());
   for (const Named<Number>& named : all) names.push_back(named.name);
   return names;
 }
