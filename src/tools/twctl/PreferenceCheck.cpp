@@ -33,7 +33,8 @@ std::vector<std::string> preferenceProblems(std::string_view domain, std::string
   if (preference == nullptr) return {};
   if (auto problem = problemWith(*preference, value)) return {std::move(*problem)};
   std::vector<std::string> problems = problemsInside(*preference, value);
-  for (std::string& problem : problems) problem = std::string(key) + ": " + problem;
+  const std::string place = std::string(key) + ": ";
+  for (std::string& problem : problems) problem.insert(0, place);
   return problems;
 }
 
