@@ -17,3 +17,15 @@ check "the maker's lies beside it" grep -qx '# A line of the new version.' /etc/
 check 'the socket is served and belongs to the group' equal "$(stat --format '%U:%G %a' /run/tonewerk/reporting.sock)" 'tonewerk:audio 660'
 check 'what was stored is there' stored com.orvane.standalone.Playback.Start
 check "the user's socket waits" as player systemctl --user --quiet is-active twreportingd.socket
+
+# A link in the place of the daemon's preferences, as whoever broke into the daemon could make one.
+stop_daemon
+mv $preferences $preferences.away
+mkdir /tmp/of-root
+touch /tmp/of-root/x.toml
+ln -s /tmp/of-root $preferences
+/var/lib/dpkg/info/tonewerk-reporting-daemon.postinst configure >/dev/null 2>&1
+check "root's files behind a link stay root's" equal "$(stat --format %U /tmp/of-root /tmp/of-root/x.toml | sort -u)" root
+rm $preferences
+mv $preferences.away $preferences
+check 'the daemon starts after it' start_daemon
