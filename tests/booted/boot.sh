@@ -2,7 +2,7 @@
 
 check 'the system comes up with nothing failed' says '^running$' systemctl is-system-running --wait
 check 'AppArmor holds the daemon to its profile' grep -qx 'twreportingd (enforce)' /sys/kernel/security/apparmor/profiles
-check 'what the profile denies can be read' refuses aa-exec --profile=twreportingd -- cat /etc/shadow
+check 'what the profile denies cannot be read' refuses aa-exec --profile=twreportingd -- cat /etc/shadow
 check 'and would be seen' refuses has_no_new_denials
 check 'the socket waits for the first client' is_in_state active twreportingd.socket
 check 'no daemon runs without a client' is_in_state inactive
