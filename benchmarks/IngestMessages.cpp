@@ -5,7 +5,7 @@
 #include <string_view>
 #include <vector>
 
-#include "platform/linux/RpcWriter.h"
+#include "platform/linux/messagepack/RpcWriter.h"
 #include "support/client/ReportingClient.h"
 
 namespace tonewerk {

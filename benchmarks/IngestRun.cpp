@@ -6,7 +6,7 @@
 
 #include "IngestClients.h"
 #include "ServerProcess.h"
-#include "platform/linux/SqliteDatabase.h"
+#include "platform/linux/store/SqliteDatabase.h"
 
 namespace tonewerk {
 namespace {

@@ -11,8 +11,8 @@
 #include <system_error>
 #include <unistd.h>
 
-#include "platform/linux/FileDescriptor.h"
-#include "platform/linux/UnixAddress.h"
+#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/socket/UnixAddress.h"
 
 namespace tonewerk {
 namespace {

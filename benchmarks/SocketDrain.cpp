@@ -11,7 +11,7 @@
 #include <unistd.h>
 #include <vector>
 
-#include "platform/linux/UnixAddress.h"
+#include "platform/linux/socket/UnixAddress.h"
 
 namespace tonewerk {
 namespace {

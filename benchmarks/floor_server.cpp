@@ -19,8 +19,8 @@
 #include <unordered_map>
 #include <vector>
 
-#include "platform/linux/Epoll.h"
-#include "platform/linux/FileDescriptor.h"
+#include "platform/linux/files/Epoll.h"
+#include "platform/linux/files/FileDescriptor.h"
 
 namespace tonewerk {
 namespace {

@@ -9,9 +9,9 @@
 #include <thread>
 
 #include "platform/KolviProbeMaker.h"
-#include "platform/linux/JsonBenchfile.h"
-#include "platform/linux/SystemClock.h"
-#include "platform/linux/lttng/TracingRig.h"
+#include "platform/linux/json/JsonBenchfile.h"
+#include "platform/linux/threads/SystemClock.h"
+#include "platform/linux/tracing/lttng/TracingRig.h"
 #include "tonewerk/signpost.h"
 
 namespace tonewerk {

@@ -6,8 +6,8 @@
 #include <cstdlib>
 #include <string_view>
 
-#include "platform/linux/ProtozeroReader.h"
-#include "platform/linux/ProtozeroWriter.h"
+#include "platform/linux/protobuf/ProtozeroReader.h"
+#include "platform/linux/protobuf/ProtozeroWriter.h"
 #include "workers/sinks/AudioIssueDetected.h"
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {

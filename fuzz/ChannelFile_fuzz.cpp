@@ -10,8 +10,8 @@
 
 #include "platform/chanmeter/ChanmeterDifference.h"
 #include "platform/chanmeter/ChanmeterRecordSample.h"
-#include "platform/linux/ChannelFile.h"
-#include "platform/linux/Utf8.h"
+#include "platform/linux/channels/ChannelFile.h"
+#include "platform/linux/files/Utf8.h"
 
 namespace tonewerk {
 namespace {

@@ -11,10 +11,10 @@
 #include <string_view>
 
 #include "platform/ExportedInterface.h"
-#include "platform/linux/RpcFrameReader.h"
-#include "platform/linux/RpcLimits.h"
-#include "platform/linux/RpcWriter.h"
-#include "platform/linux/Utf8.h"
+#include "platform/linux/files/Utf8.h"
+#include "platform/linux/messagepack/RpcFrameReader.h"
+#include "platform/linux/messagepack/RpcLimits.h"
+#include "platform/linux/messagepack/RpcWriter.h"
 
 namespace tonewerk {
 namespace {

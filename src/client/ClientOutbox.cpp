@@ -6,7 +6,7 @@
 
 #include "client/MessageFrame.h"
 #include "client/RequestBody.h"
-#include "platform/linux/RpcLimits.h"
+#include "platform/linux/messagepack/RpcLimits.h"
 
 namespace tonewerk {
 namespace {

@@ -17,7 +17,7 @@
 #include "client/OutgoingBatch.h"
 #include "client/ReplyTable.h"
 #include "client/SessionRecord.h"
-#include "platform/linux/RpcFrame.h"
+#include "platform/linux/messagepack/RpcFrame.h"
 
 namespace tonewerk {
 

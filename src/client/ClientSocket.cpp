@@ -6,7 +6,7 @@
 #include <sys/socket.h>
 #include <sys/time.h>
 
-#include "platform/linux/UnixAddress.h"
+#include "platform/linux/socket/UnixAddress.h"
 
 namespace tonewerk {
 namespace {

@@ -5,7 +5,7 @@
 #include <string>
 #include <string_view>
 
-#include "platform/linux/FileDescriptor.h"
+#include "platform/linux/files/FileDescriptor.h"
 
 namespace tonewerk {
 

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "client/DecodedAnswer.h"
 
-#include "platform/linux/RpcWriter.h"
+#include "platform/linux/messagepack/RpcWriter.h"
 
 namespace tonewerk {
 namespace {

@@ -6,7 +6,7 @@
 #include <vector>
 
 #include "client/PendingReply.h"
-#include "platform/linux/RpcFrame.h"
+#include "platform/linux/messagepack/RpcFrame.h"
 #include "tonewerk/reporting.h"
 
 namespace tonewerk {

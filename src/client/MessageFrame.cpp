@@ -4,7 +4,7 @@
 #include <string_view>
 
 #include "client/RequestBody.h"
-#include "platform/linux/RpcPacker.h"
+#include "platform/linux/messagepack/RpcPacker.h"
 
 namespace tonewerk {
 namespace {

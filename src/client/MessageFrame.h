@@ -8,7 +8,7 @@
 #include <string>
 
 #include "client/MessageRing.h"
-#include "platform/linux/RpcLimits.h"
+#include "platform/linux/messagepack/RpcLimits.h"
 
 namespace tonewerk {
 

@@ -7,8 +7,8 @@
 #include <string_view>
 
 #include "client/PayloadFlags.h"
-#include "platform/linux/RpcPacker.h"
-#include "platform/linux/Utf8.h"
+#include "platform/linux/files/Utf8.h"
+#include "platform/linux/messagepack/RpcPacker.h"
 #include "tonewerk/reporting.h"
 
 namespace tonewerk {

@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "client/RequestBody.h"
 
-#include "platform/linux/RpcFrameReader.h"
-#include "platform/linux/RpcPacker.h"
-#include "platform/linux/RpcWriter.h"
+#include "platform/linux/messagepack/RpcFrameReader.h"
+#include "platform/linux/messagepack/RpcPacker.h"
+#include "platform/linux/messagepack/RpcWriter.h"
 
 namespace tonewerk {
 namespace {

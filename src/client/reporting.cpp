@@ -20,8 +20,8 @@
 #include "client/PayloadFlags.h"
 #include "client/RequestBody.h"
 #include "client/SocketPaths.h"
-#include "platform/linux/RpcLimits.h"
-#include "platform/linux/Utf8.h"
+#include "platform/linux/files/Utf8.h"
+#include "platform/linux/messagepack/RpcLimits.h"
 
 namespace tonewerk {
 namespace {

@@ -11,7 +11,7 @@
 #include "client/RequestBody.h"
 #include "client/ScriptedDaemon.h"
 #include "client/TestPayload.h"
-#include "platform/linux/RpcFrameReader.h"
+#include "platform/linux/messagepack/RpcFrameReader.h"
 
 namespace tonewerk {
 namespace {

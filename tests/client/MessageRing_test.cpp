@@ -10,7 +10,7 @@
 #include <tuple>
 #include <vector>
 
-#include "platform/linux/RpcLimits.h"
+#include "platform/linux/messagepack/RpcLimits.h"
 
 namespace tonewerk {
 namespace {

@@ -7,7 +7,7 @@
 #include <string_view>
 #include <utility>
 
-#include "platform/linux/RpcFrameReader.h"
+#include "platform/linux/messagepack/RpcFrameReader.h"
 
 namespace tonewerk {
 

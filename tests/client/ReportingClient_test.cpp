@@ -12,13 +12,13 @@
 #include <unistd.h>
 #include <vector>
 
-#include "platform/linux/FileDescriptor.h"
-#include "platform/linux/Hex.h"
-#include "platform/linux/MessagingRig.h"
-#include "platform/linux/RpcLimits.h"
-#include "platform/linux/RpcWriter.h"
-#include "platform/linux/UnixAddress.h"
-#include "platform/linux/UnixSocketListener.h"
+#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/messagepack/RpcLimits.h"
+#include "platform/linux/messagepack/RpcWriter.h"
+#include "platform/linux/messaging/MessagingRig.h"
+#include "platform/linux/protobuf/Hex.h"
+#include "platform/linux/socket/UnixAddress.h"
+#include "platform/linux/socket/UnixSocketListener.h"
 #include "support/MemoryLog.h"
 #include "support/TemporaryDirectory.h"
 

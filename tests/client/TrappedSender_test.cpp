@@ -6,7 +6,7 @@
 #include <sys/syscall.h>
 #include <vector>
 
-#include "platform/linux/BoundedCommand.h"
+#include "platform/linux/commands/BoundedCommand.h"
 #include "support/TemporaryDirectory.h"
 
 namespace tonewerk {

@@ -7,7 +7,7 @@
 #include <thread>
 
 #include "client/ClientTest.h"
-#include "platform/linux/RpcLimits.h"
+#include "platform/linux/messagepack/RpcLimits.h"
 
 namespace tonewerk {
 namespace {

@@ -5,7 +5,7 @@
 #include <utility>
 #include <vector>
 
-#include "platform/linux/HttpClient.h"
+#include "platform/linux/otlp/HttpClient.h"
 
 namespace tonewerk {
 

@@ -7,8 +7,8 @@
 #include <thread>
 #include <vector>
 
-#include "platform/linux/RawClient.h"
-#include "platform/linux/RpcLimits.h"
+#include "platform/linux/messagepack/RpcLimits.h"
+#include "platform/linux/socket/RawClient.h"
 #include "service/TWReportingClientServerInstance.h"
 #include "system/support/DaemonTest.h"
 #include "system/support/Packed.h"

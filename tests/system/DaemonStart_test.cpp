@@ -9,8 +9,8 @@
 #include <sys/stat.h>
 #include <vector>
 
-#include "platform/linux/FileDescriptor.h"
-#include "platform/linux/UnixAddress.h"
+#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/socket/UnixAddress.h"
 #include "support/TemporaryDirectory.h"
 #include "system/support/DaemonTest.h"
 

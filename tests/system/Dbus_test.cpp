@@ -9,10 +9,10 @@
 #include <string>
 #include <unistd.h>
 
-#include "platform/linux/DbusCaller.h"
-#include "platform/linux/DbusValues.h"
-#include "platform/linux/ForeignDbusCaller.h"
-#include "platform/linux/PrivateBus.h"
+#include "platform/linux/dbus/DbusCaller.h"
+#include "platform/linux/dbus/DbusValues.h"
+#include "platform/linux/dbus/ForeignDbusCaller.h"
+#include "platform/linux/dbus/PrivateBus.h"
 #include "support/TemporaryDirectory.h"
 #include "system/support/DaemonTest.h"
 #include "system/support/RecordedEvents.h"

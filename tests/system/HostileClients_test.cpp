@@ -8,7 +8,7 @@
 #include <thread>
 #include <vector>
 
-#include "platform/linux/RawClient.h"
+#include "platform/linux/socket/RawClient.h"
 #include "service/TWReportingServiceExport.h"
 #include "system/support/DaemonTest.h"
 #include "system/support/Packed.h"

@@ -6,8 +6,8 @@
 #include <unistd.h>
 #include <vector>
 
-#include "platform/linux/RawClient.h"
-#include "platform/linux/RpcLimits.h"
+#include "platform/linux/messagepack/RpcLimits.h"
+#include "platform/linux/socket/RawClient.h"
 #include "system/support/DaemonTest.h"
 #include "system/support/Packed.h"
 

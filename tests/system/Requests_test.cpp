@@ -4,7 +4,7 @@
 #include <string>
 #include <vector>
 
-#include "platform/linux/RawClient.h"
+#include "platform/linux/socket/RawClient.h"
 #include "system/support/DaemonTest.h"
 #include "system/support/Packed.h"
 

@@ -5,7 +5,7 @@
 #include <string>
 #include <sys/stat.h>
 
-#include "platform/linux/FileDescriptor.h"
+#include "platform/linux/files/FileDescriptor.h"
 #include "support/NotifySocket.h"
 #include "system/support/DaemonTest.h"
 

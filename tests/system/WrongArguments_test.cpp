@@ -6,7 +6,7 @@
 #include <string>
 #include <vector>
 
-#include "platform/linux/RawClient.h"
+#include "platform/linux/socket/RawClient.h"
 #include "service/TWReportingServiceExport.h"
 #include "system/support/DaemonTest.h"
 #include "system/support/Packed.h"

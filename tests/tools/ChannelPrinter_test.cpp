@@ -5,7 +5,7 @@
 #include <sstream>
 #include <string>
 
-#include "platform/linux/NlohmannJsonService.h"
+#include "platform/linux/json/NlohmannJsonService.h"
 #include "support/ChannelRecords.h"
 #include "support/MemoryChanmeter.h"
 #include "tools/twctl/ChannelText.h"

@@ -7,7 +7,7 @@
 #include <string>
 #include <vector>
 
-#include "platform/linux/NlohmannJsonService.h"
+#include "platform/linux/json/NlohmannJsonService.h"
 #include "support/TemporaryDirectory.h"
 #include "tools/twctl/Commands.h"
 

@@ -9,7 +9,7 @@
 #include <string>
 #include <vector>
 
-#include "platform/linux/NlohmannJsonService.h"
+#include "platform/linux/json/NlohmannJsonService.h"
 #include "support/TemporaryDirectory.h"
 #include "tools/ScriptedDaemon.h"
 #include "tools/twctl/Commands.h"

@@ -10,10 +10,10 @@
 #include <utility>
 #include <vector>
 
-#include "platform/linux/FileDescriptor.h"
-#include "platform/linux/NlohmannJsonService.h"
-#include "platform/linux/ReportStore.h"
-#include "platform/linux/UnixAddress.h"
+#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/json/NlohmannJsonService.h"
+#include "platform/linux/socket/UnixAddress.h"
+#include "platform/linux/store/ReportStore.h"
 #include "support/ManualClock.h"
 #include "support/MemoryLog.h"
 #include "support/MemoryPreferenceStore.h"

@@ -8,8 +8,8 @@
 #include <unistd.h>
 #include <vector>
 
-#include "platform/linux/DiagnosticsDirectory.h"
-#include "platform/linux/NlohmannJsonService.h"
+#include "platform/linux/diagnostics/DiagnosticsDirectory.h"
+#include "platform/linux/json/NlohmannJsonService.h"
 #include "support/TemporaryDirectory.h"
 #include "tools/twctl/Commands.h"
 #include "tools/twctl/DiagnosticSummary.h"

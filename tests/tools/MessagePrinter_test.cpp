@@ -4,7 +4,7 @@
 #include <gtest/gtest.h>
 #include <sstream>
 
-#include "platform/linux/NlohmannJsonService.h"
+#include "platform/linux/json/NlohmannJsonService.h"
 #include "tools/twctl/Tool.h"
 
 namespace tonewerk {

@@ -6,8 +6,8 @@
 #include <vector>
 
 #include "platform/LogCategory.h"
-#include "platform/linux/NlohmannJsonService.h"
-#include "platform/linux/ReportStore.h"
+#include "platform/linux/json/NlohmannJsonService.h"
+#include "platform/linux/store/ReportStore.h"
 #include "support/ManualClock.h"
 #include "support/MemoryLog.h"
 #include "support/MemoryPreferenceStore.h"

@@ -14,8 +14,8 @@
 #include <vector>
 
 #include "platform/LogCategory.h"
-#include "platform/linux/ServerSocket.h"
-#include "platform/linux/UnixSocketListener.h"
+#include "platform/linux/socket/ServerSocket.h"
+#include "platform/linux/socket/UnixSocketListener.h"
 #include "service/TWReportingServiceExport.h"
 #include "support/MemoryLog.h"
 

@@ -5,8 +5,8 @@
 #include <system_error>
 #include <utility>
 
-#include "platform/linux/DurableFile.h"
-#include "platform/linux/NlohmannJsonService.h"
+#include "platform/linux/files/DurableFile.h"
+#include "platform/linux/json/NlohmannJsonService.h"
 
 namespace tonewerk {
 

@@ -3,7 +3,7 @@
 
 #include <algorithm>
 
-#include "platform/linux/Utf8.h"
+#include "platform/linux/files/Utf8.h"
 #include "values/ShortenedText.h"
 
 namespace tonewerk {

@@ -7,7 +7,7 @@
 #include <vector>
 
 #include "bridges/pipewire/EventLoop.h"
-#include "platform/linux/WakeEvent.h"
+#include "platform/linux/threads/WakeEvent.h"
 
 namespace tonewerk {
 

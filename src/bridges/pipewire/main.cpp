@@ -12,7 +12,7 @@
 #include "bridges/pipewire/PipeWireGraph.h"
 #include "bridges/pipewire/PublishingSessionSink.h"
 #include "bridges/pipewire/StreamReports.h"
-#include "platform/linux/SystemClock.h"
+#include "platform/linux/threads/SystemClock.h"
 
 namespace tonewerk {
 namespace {

@@ -11,8 +11,8 @@
 #include <string_view>
 #include <system_error>
 
-#include "platform/linux/NamedLines.h"
-#include "platform/linux/ProcessStat.h"
+#include "platform/linux/files/NamedLines.h"
+#include "platform/linux/system/ProcessStat.h"
 
 namespace tonewerk {
 namespace {

@@ -6,7 +6,7 @@
 #include <thread>
 
 #include "platform/LogCategory.h"
-#include "platform/linux/LinuxChanmeter.h"
+#include "platform/linux/channels/LinuxChanmeter.h"
 #include "tools/twctl/ChannelPrinter.h"
 #include "tools/twctl/Commands.h"
 #include "tools/twctl/ToolLog.h"

@@ -7,7 +7,7 @@
 #include <utility>
 #include <vector>
 
-#include "platform/linux/DiagnosticItem.h"
+#include "platform/linux/diagnostics/DiagnosticItem.h"
 
 namespace tonewerk {
 

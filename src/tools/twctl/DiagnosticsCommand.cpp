@@ -8,7 +8,7 @@
 #include <string>
 #include <vector>
 
-#include "platform/linux/DiagnosticsDirectory.h"
+#include "platform/linux/diagnostics/DiagnosticsDirectory.h"
 #include "tools/twctl/Commands.h"
 #include "tools/twctl/DiagnosticSummary.h"
 #include "tools/twctl/Table.h"

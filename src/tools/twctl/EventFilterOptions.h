@@ -5,7 +5,7 @@
 #include <optional>
 #include <string>
 
-#include "platform/linux/StoreReader.h"
+#include "platform/linux/store/StoreReader.h"
 
 namespace CLI {
 class App;

@@ -4,7 +4,7 @@
 #include <chrono>
 #include <optional>
 
-#include "platform/linux/FileDescriptor.h"
+#include "platform/linux/files/FileDescriptor.h"
 
 namespace tonewerk {
 

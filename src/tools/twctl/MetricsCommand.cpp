@@ -4,9 +4,9 @@
 #include <string>
 #include <vector>
 
-#include "platform/linux/ProtozeroReader.h"
-#include "platform/linux/StoreReader.h"
-#include "platform/linux/ValueMapFormatter.h"
+#include "platform/linux/json/ValueMapFormatter.h"
+#include "platform/linux/protobuf/ProtozeroReader.h"
+#include "platform/linux/store/StoreReader.h"
 #include "tools/twctl/Commands.h"
 #include "tools/twctl/EventFilterOptions.h"
 #include "tools/twctl/Table.h"

@@ -8,7 +8,7 @@
 #include <system_error>
 
 #include "platform/NotificationHandlers.h"
-#include "platform/linux/NotificationFiles.h"
+#include "platform/linux/notifications/NotificationFiles.h"
 #include "tools/twctl/Commands.h"
 #include "tools/twctl/Table.h"
 

@@ -6,7 +6,7 @@
 #include <utility>
 #include <vector>
 
-#include "platform/linux/StoreSchema.h"
+#include "platform/linux/store/StoreSchema.h"
 #include "tools/twctl/Commands.h"
 #include "tools/twctl/Suggestion.h"
 #include "tools/twctl/Table.h"

@@ -5,7 +5,7 @@
 #include <string>
 #include <vector>
 
-#include "platform/linux/StoreReader.h"
+#include "platform/linux/store/StoreReader.h"
 #include "tools/twctl/Commands.h"
 #include "tools/twctl/EventFilterOptions.h"
 #include "tools/twctl/Table.h"

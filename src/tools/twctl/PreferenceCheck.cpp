@@ -2,10 +2,10 @@
 #include "tools/twctl/PreferenceCheck.h"
 
 #include "platform/PreferenceSchema.h"
-#include "platform/linux/AnalyticsConsumers.h"
-#include "platform/linux/LinkReportBackends.h"
-#include "platform/linux/LinuxLinkReport.h"
-#include "platform/linux/StoreMetricon.h"
+#include "platform/linux/otlp/LinkReportBackends.h"
+#include "platform/linux/otlp/LinuxLinkReport.h"
+#include "platform/linux/store/AnalyticsConsumers.h"
+#include "platform/linux/store/StoreMetricon.h"
 #include "tools/twctl/Suggestion.h"
 
 namespace tonewerk {

@@ -2,7 +2,7 @@
 #include <iostream>
 #include <unistd.h>
 
-#include "platform/linux/NlohmannJsonService.h"
+#include "platform/linux/json/NlohmannJsonService.h"
 #include "tools/twctl/Commands.h"
 
 int main(int argc, char** argv) {

@@ -9,7 +9,7 @@
 #include "bridges/pipewire/RecordingDaemon.h"
 #include "bridges/pipewire/Said.h"
 #include "bridges/pipewire/StreamReports.h"
-#include "platform/linux/UnixAddress.h"
+#include "platform/linux/socket/UnixAddress.h"
 #include "support/ManualClock.h"
 #include "support/ManualEventLoop.h"
 #include "support/TemporaryDirectory.h"

@@ -12,7 +12,7 @@
 #include <vector>
 
 #include "platform/LogCategory.h"
-#include "platform/linux/UnixSocketListener.h"
+#include "platform/linux/socket/UnixSocketListener.h"
 #include "service/TWReportingServiceExport.h"
 #include "support/MemoryLog.h"
 

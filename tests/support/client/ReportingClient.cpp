@@ -7,9 +7,9 @@
 #include <unordered_map>
 #include <utility>
 
-#include "platform/linux/Directories.h"
-#include "platform/linux/RpcLimits.h"
-#include "platform/linux/RpcWriter.h"
+#include "platform/linux/files/Directories.h"
+#include "platform/linux/messagepack/RpcLimits.h"
+#include "platform/linux/messagepack/RpcWriter.h"
 #include "support/client/RpcClientSocket.h"
 
 namespace tonewerk {

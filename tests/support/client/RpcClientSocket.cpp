@@ -12,7 +12,7 @@
 #include <sys/time.h>
 #include <utility>
 
-#include "platform/linux/UnixAddress.h"
+#include "platform/linux/socket/UnixAddress.h"
 
 namespace tonewerk {
 namespace {

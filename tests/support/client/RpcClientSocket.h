@@ -7,9 +7,9 @@
 #include <string_view>
 #include <system_error>
 
-#include "platform/linux/FileDescriptor.h"
-#include "platform/linux/RpcFrame.h"
-#include "platform/linux/RpcFrameReader.h"
+#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/messagepack/RpcFrame.h"
+#include "platform/linux/messagepack/RpcFrameReader.h"
 
 namespace tonewerk {
 

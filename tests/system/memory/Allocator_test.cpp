@@ -6,7 +6,7 @@
 #include <memory>
 #include <vector>
 
-#include "platform/linux/AllocatorReclaimer.h"
+#include "platform/linux/messaging/AllocatorReclaimer.h"
 #include "system/memory/Sanitizers.h"
 
 namespace tonewerk {

@@ -7,12 +7,12 @@
 #include <list>
 #include <string>
 
-#include "platform/linux/AllocatorReclaimer.h"
-#include "platform/linux/DbusCaller.h"
-#include "platform/linux/DbusValues.h"
-#include "platform/linux/PrivateBus.h"
-#include "platform/linux/RawClient.h"
-#include "platform/linux/RpcLimits.h"
+#include "platform/linux/dbus/DbusCaller.h"
+#include "platform/linux/dbus/DbusValues.h"
+#include "platform/linux/dbus/PrivateBus.h"
+#include "platform/linux/messagepack/RpcLimits.h"
+#include "platform/linux/messaging/AllocatorReclaimer.h"
+#include "platform/linux/socket/RawClient.h"
 #include "system/memory/Sanitizers.h"
 #include "system/support/DaemonTest.h"
 #include "system/support/Packed.h"

@@ -7,8 +7,8 @@
 #include <signal.h>
 #include <sys/socket.h>
 
-#include "platform/linux/FileDescriptor.h"
-#include "platform/linux/UnixAddress.h"
+#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/socket/UnixAddress.h"
 
 namespace tonewerk {
 

@@ -1,0 +1,155 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/channels/PublishedChannels.h"
+
+#include <algorithm>
+#include <filesystem>
+#include <sys/stat.h>
+#include <system_error>
+#include <utility>
+
+#include "platform/LogLine.h"
+#include "platform/linux/channels/ChannelFailures.h"
+#include "platform/linux/files/TextFile.h"
+#include "platform/linux/files/WholeFile.h"
+
+namespace tonewerk {
+namespace {
+
+constexpr std::string_view kEnding = ".json";
+
+bool isChannelFile(const std::string& name) { return name.ends_with(kEnding) && name.front() != '.'; }
+
+ChannelFileProblem problemOf(const std::error_code& error) {
+  if (error == std::errc::file_too_large) return {kChannelsTooLarge, "is larger than 1 MiB"};
+  if (error == std::errc::resource_unavailable_try_again) {
+    return {kChannelsUnsettled, "was written to whenever it was read"};
+  }
+  if (error == std::errc::invalid_argument) return {kChannelsUnreadable, "is no regular file"};
+  return {kChannelsUnreadable, error.message()};
+}
+
+ChannelFileProblem pastBound(std::size_t bound, const char* what) {
+  return {kChannelsTooMany,
+          "goes past the " + std::to_string(bound) + " " + what + " that all files together may have"};
+}
+
+}  // namespace
+
+void PublishedChannels::read(const ChannelChoice& choice, ChanmeterRecords& records,
+                             std::optional<ChanmeterError>& error) {
+  const std::lock_guard lock(mutex_);
+  const std::vector<std::string> names = fileNames(error);
+  forgetAllBut(names);
+  Sums sums;
+  for (const std::string& name : names) {
+    File& file = files_[name];
+    // A file that is known to be another driver's need not be looked at.
+    if (file.driver && !choice.concerns(file.driver)) {
+      sums.bytes += file.text.size();
+      sums.channels += file.records.size();
+      continue;
+    }
+    const std::string path = directory_ + "/" + name;
+    const ChannelFileProblem problem = refresh(path, file, sums);
+    complain(path, problem, file.logged);
+    if (problem.code != 0) {
+      if (!error && choice.concerns(file.driver)) error = ChanmeterError{problem.code};
+      continue;
+    }
+    std::copy_if(file.records.begin(), file.records.end(), std::back_inserter(records),
+                 [&choice](const auto& record) { return choice.has(record->key); });
+  }
+}
+
+std::vector<std::string> PublishedChannels::fileNames(std::optional<ChanmeterError>& error) {
+  std::vector<std::string> names;
+  std::size_t entries = 0;
+  std::error_code failure;
+  std::filesystem::directory_iterator entry(directory_, failure);
+  for (const std::filesystem::directory_iterator end; !failure && entry != end && entries < kMostEntries;
+       entry.increment(failure)) {
+    ++entries;
+    std::string name = entry->path().filename().string();
+    if (isChannelFile(name)) names.push_back(std::move(name));
+  }
+  std::sort(names.begin(), names.end());
+
+  ChannelFileProblem problem;
+  if (failure && failure != std::errc::no_such_file_or_directory) problem = problemOf(failure);
+  if (entries == kMostEntries && entry != std::filesystem::directory_iterator()) {
+    problem = {kChannelsTooMany, "holds more than " + std::to_string(kMostEntries) +
+                                     " entries, of which the others are left out"};
+  }
+  if (names.size() > kMostFiles) {
+    problem = {kChannelsTooMany, "holds more than " + std::to_string(kMostFiles) +
+                                     " channel files; left out is all from " + names[kMostFiles] + " on"};
+    names.resize(kMostFiles);
+  }
+  complain(directory_, problem, loggedOfDirectory_);
+  if (problem.code != 0) error = ChanmeterError{problem.code};
+  return names;
+}
+
+void PublishedChannels::forgetAllBut(const std::vector<std::string>& names) {
+  std::erase_if(files_, [&names](const auto& file) {
+    return !std::binary_search(names.begin(), names.end(), file.first);
+  });
+}
+
+// What is wrong with the file, or with its being one too many; the latter depends on the files before it.
+ChannelFileProblem PublishedChannels::refresh(const std::string& path, File& file, Sums& sums) {
+  struct stat status {};
+  if (stat(path.c_str(), &status) != 0) {
+    const std::error_code error = lastSystemError();
+    file.letGo();
+    // Gone since its name was read, or a link to nowhere.
+    return error == std::errc::no_such_file_or_directory ? ChannelFileProblem() : problemOf(error);
+  }
+  const auto size = static_cast<std::size_t>(status.st_size);
+  if (S_ISREG(status.st_mode) && size <= kMostFileBytes) sums.bytes += size;
+  if (sums.bytes > kMostBytes) {
+    file.letGo();  // it may have been read when there were fewer files before it
+    return pastBound(kMostBytes, "bytes");
+  }
+
+  if (!file.stamp || FileStamp::of(status) != *file.stamp) readAgain(path, file);
+  sums.channels += file.records.size();
+  if (sums.channels > kMostChannels) return pastBound(kMostChannels, "channels");
+  return file.problem;
+}
+
+void PublishedChannels::File::letGo() {
+  stamp.reset();
+  text.clear();
+  text.shrink_to_fit();
+  records.clear();
+}
+
+void PublishedChannels::readAgain(const std::string& path, File& file) {
+  std::string text;
+  FileStamp stamp{};
+  file.stamp.reset();
+  if (const std::error_code error = readWholeFile(path, kMostFileBytes, text, stamp)) {
+    file.letGo();
+    file.problem = error == std::errc::no_such_file_or_directory ? ChannelFileProblem() : problemOf(error);
+    return;
+  }
+  if (stamp.isSettled()) file.stamp = stamp;
+  if (text == file.text && !text.empty()) return;
+  file.text = std::move(text);
+  file.problem = {};
+  std::optional<ChannelFile> parsed = ChannelFile::parse(file.text, file.problem);
+  file.records = parsed ? std::move(parsed->records) : ChanmeterRecords();
+  if (parsed) file.driver = std::move(parsed->driver);
+}
+
+void PublishedChannels::complain(const std::string& path, const ChannelFileProblem& problem,
+                                 std::string& logged) const {
+  if (problem.text == logged) return;
+  logged = problem.text;
+  if (problem.code == 0) return;
+  errorLog(log_, "%s: %s (failure %lli; the channels concerned are left out)", path, problem.text,
+           problem.code);
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,136 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/dbus/DbusConnection.h"
+
+#include <cerrno>
+#include <system_error>
+#include <systemd/sd-bus.h>
+#include <utility>
+
+#include "platform/LogLine.h"
+#include "platform/linux/dbus/DbusAnswer.h"
+#include "platform/linux/messaging/AllocatorReclaimer.h"
+
+namespace tonewerk {
+namespace {
+
+// What a request holds while it is under way: the message itself, which its answer needs, and what has been
+// made of it.
+std::size_t bytesHeldBy(const DbusArguments& read) {
+  std::size_t bytes = read.wireBytes + read.arguments.capacity() * sizeof(Argument);
+  for (const Argument& argument : read.arguments) {
+    if (argument) bytes += argument->bytes();
+  }
+  return bytes;
+}
+
+}  // namespace
+
+DbusConnection::DbusConnection(const DbusConnectionContext& context, std::uint64_t identifier,
+                               std::string name)
+    : context_(context),
+      identifier_(identifier),
+      name_(std::move(name)),
+      load_(std::make_shared<RequestLoad>(context.waker, identifier)),
+      outbox_(std::make_shared<DbusOutbox>(context.waker, identifier)) {}
+
+DbusConnection::~DbusConnection() {
+  outbox_->close();
+  if (context_.memory != nullptr) context_.memory->clientWent();
+}
+
+std::string DbusConnection::description() const {
+  const std::string user = peer_.userIdentifier == kNoUser ? "unknown" : std::to_string(peer_.userIdentifier);
+  return "connection " + std::to_string(identifier_) + " of process " +
+         std::to_string(peer_.processIdentifier) + ", user " + user + ", on D-Bus as " + name_;
+}
+
+void DbusConnection::exportObject(const ExportedInterface&, std::shared_ptr<ExportedObject> object) {
+  object_ = std::move(object);
+}
+
+void DbusConnection::resume() {
+  isResumed_ = true;
+  handOverWaiting();
+}
+
+std::optional<ReplyError> DbusConnection::take(sd_bus_message* call, const DbusInterface::Entry& entry) {
+  if (isTurnedAway_) return messagingError(kNotPermitted, "the service does not take this client");
+  if (!load_->hasRoom(outbox_->unsentBytes())) {
+    return messagingError(kOverLimit, "too many requests of this client are under way");
+  }
+  const Method& method = context_.interface.methodOf(entry);
+  DbusArguments read = readDbusArguments(call, entry, method, context_.texts);
+  if (context_.memory != nullptr) context_.memory->clientBrought(read.wireBytes);
+  if (read.problem) return std::move(read.problem);
+  RequestToken token = load_->start(bytesHeldBy(read) + method.replyBytes);
+  handOver({entry.place, std::move(read.arguments), replyTo(call, method.result.type), std::move(token)});
+  return std::nullopt;
+}
+
+// An empty one when nobody waits for an answer.
+Reply DbusConnection::replyTo(sd_bus_message* call, ResultType result) {
+  if (result == ResultType::kNever || sd_bus_message_get_expect_reply(call) <= 0) return {};
+  const std::uint32_t number = nextCall_++;
+  calls_.insert_or_assign(number, Call{BusMessage(sd_bus_message_ref(call)), result});
+  return {std::make_shared<DbusReply>(outbox_, number), number};
+}
+
+void DbusConnection::handOver(Request request) {
+  if (!isAccepted_ || !isResumed_) {
+    waiting_.push_back(std::move(request));
+    return;
+  }
+  // Held here, too: what the request leads to may end the connection.
+  const std::shared_ptr<ExportedObject> object = object_;
+  object->handleRequest(request.method, std::move(request.arguments), std::move(request.reply),
+                        std::move(request.token));
+}
+
+void DbusConnection::handOverWaiting() {
+  if (!isAccepted_ || !isResumed_) return;
+  for (Request& request : std::exchange(waiting_, {})) handOver(std::move(request));
+}
+
+void DbusConnection::identify(DbusPeer peer) {
+  if (std::exchange(isIdentified_, true)) return;
+  peer_ = peer;
+  infoLog(context_.log, "new %@", *this);
+  isAccepted_ = context_.delegate.listenerShouldAcceptNewConnection(*this) && object_ != nullptr;
+  if (isAccepted_) return handOverWaiting();
+  infoLog(context_.log, "%@ was turned away", *this);
+  isTurnedAway_ = true;
+  const ReplyError error = messagingError(kNotPermitted, "the service does not take this client");
+  for (Request& request : std::exchange(waiting_, {})) request.reply(error);
+}
+
+bool DbusConnection::sendNext(sd_bus* bus) {
+  const std::optional<DbusOutcome> outcome = outbox_->next();
+  if (!outcome) return false;
+  const auto found = calls_.find(outcome->call);
+  if (found == calls_.end()) return true;
+  const Call call = std::move(found->second);
+  calls_.erase(found);
+  if (!outcome->isAnswered) return true;
+  const BusMessage answer = makeDbusAnswer(call.message.get(), call.result, outcome->error, outcome->result);
+  const int result = answer == nullptr ? -ENOMEM : sd_bus_send(bus, answer.get(), nullptr);
+  // A bus that is gone says so when it is processed next.
+  if (result < 0 && result != -ENOTCONN) {
+    errorLog(context_.log, "cannot answer %@: %@", *this, std::generic_category().message(-result));
+  }
+  return true;
+}
+
+void DbusConnection::end() {
+  if (std::exchange(hasEnded_, true)) return;
+  outbox_->close();
+  calls_.clear();
+  waiting_.clear();
+  if (isIdentified_) infoLog(context_.log, "%@ has ended", *this);
+  if (interrupted_) interrupted_();
+  if (invalidated_) invalidated_();
+  interrupted_ = nullptr;
+  invalidated_ = nullptr;
+  object_ = nullptr;
+}
+
+}  // namespace tonewerk

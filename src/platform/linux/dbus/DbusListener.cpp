@@ -1,0 +1,87 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/dbus/DbusListener.h"
+
+#include <algorithm>
+#include <cassert>
+#include <cstdlib>
+#include <poll.h>
+#include <sys/eventfd.h>
+#include <utility>
+
+#include "platform/LogLine.h"
+#include "platform/linux/threads/ThreadProperties.h"
+
+namespace tonewerk {
+
+DbusListener::DbusListener(DbusNames names, const ExportedInterface& methods, std::string address,
+                           const LogCategory& log, AllocatorReclaimer* memory)
+    : names_(std::move(names)),
+      address_(std::move(address)),
+      log_(log),
+      interface_(methods),
+      memory_(memory) {}
+
+DbusListener::~DbusListener() { shutDown(); }
+
+void DbusListener::resume() {
+  const std::lock_guard lock(lifeMutex_);
+  assert(delegate_ != nullptr);
+  if (thread_.joinable() || isStopping_) return;
+  thread_ = std::thread([this] { run(); });
+}
+
+void DbusListener::shutDown() {
+  const std::lock_guard lock(lifeMutex_);
+  isStopping_ = true;
+  waker_->wake(0);
+  if (thread_.joinable()) thread_.join();
+}
+
+void DbusListener::run() {
+  nameThisThread("tw-dbus");
+  const DbusConnectionContext context{interface_, *delegate_, waker_, texts_, log_, memory_};
+  while (!isStopping_) {
+    const auto start = std::chrono::steady_clock::now();
+    {
+      DbusService service(names_, address_, context);
+      const DbusService::End end = service.serve(isStopping_);
+      tell(end, service.problem());
+    }
+    if (std::chrono::steady_clock::now() - start >= kLongestPause) pause_ = kFirstPause;
+    pause();
+  }
+}
+
+void DbusListener::tell(DbusService::End end, const std::string& problem) {
+  using End = DbusService::End;
+  const std::optional<End> before = std::exchange(lastEnd_, end);
+  if (end == End::kLost) {
+    errorLog(log_, "D-Bus is gone: %@", problem);
+  } else if (end == End::kRefused && before != End::kRefused) {
+    errorLog(log_, "D-Bus refuses %@: %@", names_.name, problem);
+  } else if (end == End::kNoBus && before != End::kNoBus && before != End::kLost) {
+    infoLog(log_, "no D-Bus to serve on: %@", problem);
+  }
+}
+
+// Until it is time to try again, or somebody stops the listener.
+void DbusListener::pause() {
+  const auto end = std::chrono::steady_clock::now() + pause_;
+  pause_ = std::min(pause_ * 2, kLongestPause);
+  while (!isStopping_) {
+    const auto left = std::chrono::ceil<std::chrono::milliseconds>(end - std::chrono::steady_clock::now());
+    if (left <= std::chrono::milliseconds::zero()) return;
+    pollfd waited{waker_->fileDescriptor(), POLLIN, 0};
+    ::poll(&waited, 1, static_cast<int>(left.count()));
+    eventfd_t count = 0;
+    static_cast<void>(::eventfd_read(waker_->fileDescriptor(), &count));
+    static_cast<void>(waker_->take());  // of clients that are gone
+  }
+}
+
+std::string dbusAddressFromEnvironment() {
+  const char* session = std::getenv("DBUS_SESSION_BUS_ADDRESS");
+  return session == nullptr ? "" : session;
+}
+
+}  // namespace tonewerk

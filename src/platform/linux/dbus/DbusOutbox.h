@@ -1,0 +1,75 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <atomic>
+#include <cstddef>
+#include <cstdint>
+#include <deque>
+#include <memory>
+#include <mutex>
+#include <optional>
+
+#include "platform/ExportedInterface.h"
+#include "platform/linux/threads/IoWaker.h"
+#include "platform/linux/threads/WorkBatch.h"
+
+namespace tonewerk {
+
+// What came of a call: an answer, or the certainty that there will be none.
+struct DbusOutcome {
+  std::uint32_t call = 0;
+  bool isAnswered = false;
+  std::optional<ReplyError> error;
+  std::optional<Value> result;
+};
+
+// What came of a client's calls, on its way to the bus's thread, which alone may touch the bus. Outlives the
+// client for as long as somebody can still reply; outcomes then go nowhere.
+//
+// The bus's thread is woken once a batch of work.
+class DbusOutbox final : public WorkBatch::Ending, public std::enable_shared_from_this<DbusOutbox> {
+ public:
+  // The waker wakes the bus's thread for `client`.
+  DbusOutbox(std::shared_ptr<IoWaker> waker, std::uint64_t client)
+      : waker_(std::move(waker)), client_(client) {}
+
+  // Any thread.
+  void add(DbusOutcome outcome);
+  void endOfBatch() override;
+
+  // The bus's thread.
+  std::optional<DbusOutcome> next();
+  std::size_t unsentBytes() const { return unsentBytes_.load(std::memory_order_relaxed); }
+  void close();
+
+ private:
+  const std::shared_ptr<IoWaker> waker_;
+  const std::uint64_t client_;
+  std::atomic<std::size_t> unsentBytes_{0};
+  std::mutex mutex_;
+  // Under mutex_.
+  std::deque<DbusOutcome> unsent_;
+  bool isClosed_ = false;
+  bool isPutOff_ = false;  // the waking, to the end of a batch
+};
+
+// The way back to one call. Only the first answer goes out: a call on the bus has one. When it is destroyed
+// without one, the call is let go.
+class DbusReply final : public ReplySink {
+ public:
+  DbusReply(std::shared_ptr<DbusOutbox> outbox, std::uint32_t call)
+      : outbox_(std::move(outbox)), call_(call) {}
+  DbusReply(const DbusReply&) = delete;
+  DbusReply& operator=(const DbusReply&) = delete;
+  ~DbusReply() override;
+
+  void reply(std::uint32_t call, const std::optional<ReplyError>& error,
+             const std::optional<Value>& result) override;
+
+ private:
+  const std::shared_ptr<DbusOutbox> outbox_;
+  const std::uint32_t call_;
+  std::atomic<bool> isAnswered_ = false;
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,22 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <string>
+
+#include "platform/linux/diagnostics/collectors/DiagnosticCollector.h"
+
+namespace tonewerk {
+
+// How busy the system is: /proc/loadavg, and /proc/pressure of processors, storage and memory.
+class LoadCollector final : public DiagnosticCollector {
+ public:
+  explicit LoadCollector(std::string procDirectory = "/proc") : procDirectory_(std::move(procDirectory)) {}
+
+  std::string_view fileName() const override { return "load.txt"; }
+  Result collect() override;
+
+ private:
+  const std::string procDirectory_;
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,60 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <array>
+#include <chrono>
+#include <cstdint>
+#include <optional>
+#include <span>
+#include <sys/epoll.h>
+
+#include "platform/linux/files/FileDescriptor.h"
+
+namespace tonewerk {
+
+// The kernel's list of descriptors that somebody waits on. Each is known by a number of the caller's choice.
+class Epoll {
+ public:
+  struct Event {
+    std::uint64_t identifier;
+    std::uint32_t events;  // EPOLLIN and so on
+  };
+
+  Epoll() : descriptor_(::epoll_create1(EPOLL_CLOEXEC)) {}
+
+  bool add(int descriptor, std::uint64_t identifier, std::uint32_t events) {
+    return control(EPOLL_CTL_ADD, descriptor, identifier, events);
+  }
+  bool change(int descriptor, std::uint64_t identifier, std::uint32_t events) {
+    return control(EPOLL_CTL_MOD, descriptor, identifier, events);
+  }
+  void remove(int descriptor) { control(EPOLL_CTL_DEL, descriptor, 0, 0); }
+
+  // Waits until something is ready or the time is up; without a time-out as long as it takes. The events are
+  // valid until the next call; none when the time is up or a signal came.
+  std::span<const Event> wait(std::optional<std::chrono::milliseconds> timeout) {
+    std::array<epoll_event, kMostAtOnce> ready;
+    const int count = ::epoll_wait(descriptor_.get(), ready.data(), kMostAtOnce,
+                                   timeout ? static_cast<int>(timeout->count()) : -1);
+    std::size_t kept = 0;
+    for (; count > 0 && kept < static_cast<std::size_t>(count); ++kept) {
+      events_[kept] = {ready[kept].data.u64, ready[kept].events};
+    }
+    return {events_.data(), kept};
+  }
+
+ private:
+  static constexpr int kMostAtOnce = 64;
+
+  bool control(int operation, int descriptor, std::uint64_t identifier, std::uint32_t events) {
+    epoll_event event{};
+    event.events = events;
+    event.data.u64 = identifier;
+    return ::epoll_ctl(descriptor_.get(), operation, descriptor, &event) == 0;
+  }
+
+  FileDescriptor descriptor_;
+  std::array<Event, kMostAtOnce> events_{};
+};
+
+}  // namespace tonewerk

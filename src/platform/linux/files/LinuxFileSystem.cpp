@@ -1,0 +1,268 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/files/LinuxFileSystem.h"
+
+#include <cerrno>
+#include <cstdint>
+#include <fcntl.h>
+#include <filesystem>
+#include <linux/fs.h>
+#include <random>
+#include <stdio.h>
+#include <string_view>
+#include <sys/file.h>
+#include <sys/sendfile.h>
+#include <sys/stat.h>
+#include <unistd.h>
+#include <utility>
+
+#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/files/Ownership.h"
+#include "platform/linux/files/TextFile.h"
+
+namespace tonewerk {
+namespace {
+
+constexpr mode_t kFileMode = 0644;
+constexpr std::string_view kHiddenPrefix = ".new-";
+
+bool isPlainName(std::string_view name) {
+  return !name.empty() && name != "." && name != ".." && name.find('/') == std::string_view::npos &&
+         name.find('\0') == std::string_view::npos;
+}
+
+bool isDirectory(const std::string& path) {
+  struct stat status {};
+  return stat(path.c_str(), &status) == 0 && S_ISDIR(status.st_mode);
+}
+
+// What was just made at `path` gets its mode, of which the process's mask has taken bits away, and its owner.
+std::error_code finishDirectory(const std::string& path, mode_t mode) {
+  const FileDescriptor made(open(path.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
+  if (!made) return lastSystemError();
+  const FileDescriptor parent(openat(made.get(), "..", O_PATH | O_DIRECTORY | O_CLOEXEC));
+  if (!parent) return lastSystemError();
+  if (const std::error_code error = giveToOwnerOf(parent.get(), made.get())) return error;
+  return fchmod(made.get(), mode) == 0 ? std::error_code() : lastSystemError();
+}
+
+std::error_code createDirectory(const std::string& path, mode_t mode) {
+  // Readable and open to us until it has its mode.
+  if (mkdir(path.c_str(), mode | S_IRWXU) == 0) return finishDirectory(path, mode);
+  const std::error_code error = lastSystemError();
+  if (isDirectory(path)) return {};
+  return error == std::errc::file_exists ? std::make_error_code(std::errc::not_a_directory) : error;
+}
+
+// Renames without replacing anything.
+std::error_code renameToNew(int fromDirectory, const std::string& from, int directory,
+                            const std::string& name) {
+  if (renameat2(fromDirectory, from.c_str(), directory, name.c_str(), RENAME_NOREPLACE) == 0) return {};
+  return lastSystemError();
+}
+
+// What renameToNew() fails with on a file system that can only rename over others.
+constexpr std::errc kCannotKeep = std::errc::invalid_argument;
+
+std::string newHiddenName() {
+  static thread_local std::random_device random;
+  return std::string(kHiddenPrefix) + std::to_string((std::uint64_t{random()} << 32) | random());
+}
+
+class HiddenFile final : public NewFile {
+ public:
+  // Null with `error` when the directory takes no file.
+  static std::unique_ptr<HiddenFile> make(FileDescriptor directory, std::error_code& error) {
+    auto made = std::make_unique<HiddenFile>(std::move(directory));
+    error = made->open();
+    return error ? nullptr : std::move(made);
+  }
+
+  explicit HiddenFile(FileDescriptor directory) : directory_(std::move(directory)) {}
+  HiddenFile(const HiddenFile&) = delete;
+  HiddenFile& operator=(const HiddenFile&) = delete;
+  ~HiddenFile() override { remove(); }
+
+  std::error_code write(std::string_view text) override {
+    const std::error_code error = writeAll(file_.get(), text);
+    if (error && !failure_) failure_ = error;
+    return error;
+  }
+
+  std::error_code place(const std::string& name) override {
+    if (!isPlainName(name)) return std::make_error_code(std::errc::invalid_argument);
+    if (failure_) return failure_;
+    // Else a crash of the system could leave the name with half of the text, or none, behind it.
+    if (fsync(file_.get()) != 0) return failure_ = lastSystemError();
+    std::error_code error = renameToNew(directory_.get(), hiddenName_, directory_.get(), name);
+    if (error == kCannotKeep) error = moveByLink(name);
+    if (error) return error;
+    hiddenName_.clear();
+    // The name is in the directory, which is a file of its own.
+    return fsync(directory_.get()) == 0 ? std::error_code() : lastSystemError();
+  }
+
+ private:
+  static constexpr int kMostAttempts = 8;
+
+  // Another process that looks for leftovers may come between the making and the locking; then another file
+  // is made. Who comes each time does not look for leftovers.
+  std::error_code open() {
+    for (int attempt = 0; attempt < kMostAttempts; ++attempt) {
+      const std::error_code error = create();
+      if (error && error != std::errc::file_exists) return error;
+      if (!error && lock()) return {};
+      remove();
+    }
+    return std::make_error_code(std::errc::resource_unavailable_try_again);
+  }
+
+  // Under a new name.
+  std::error_code create() {
+    std::string name = newHiddenName();
+    constexpr int kFlags = O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
+    file_ = FileDescriptor(openat(directory_.get(), name.c_str(), kFlags, kFileMode));
+    if (!file_) return lastSystemError();
+    hiddenName_ = std::move(name);
+    return {};
+  }
+
+  // False when somebody else has locked the file, or removed it.
+  //
+  // Some file systems lock nothing (shares in a network, those in user space). The file is written there all
+  // the same: who cannot lock takes nothing for a leftover either. Only where the system is out of locks for
+  // a moment may another process take it for one; then place() fails.
+  bool lock() {
+    if (flock(file_.get(), LOCK_EX | LOCK_NB) != 0) return errno != EWOULDBLOCK;
+    struct stat status {};
+    return fstat(file_.get(), &status) != 0 || status.st_nlink > 0;
+  }
+
+  std::error_code moveByLink(const std::string& name) {
+    if (linkat(directory_.get(), hiddenName_.c_str(), directory_.get(), name.c_str(), 0) != 0)
+      return lastSystemError();
+    remove();
+    return {};
+  }
+
+  // The hidden name, and with it the file unless it has another one.
+  void remove() {
+    if (!hiddenName_.empty()) unlinkat(directory_.get(), hiddenName_.c_str(), 0);
+    hiddenName_.clear();
+  }
+
+  FileDescriptor directory_;
+  std::string hiddenName_;  // empty before the file is made, and once it has its place
+  FileDescriptor file_;
+  std::error_code failure_;
+};
+
+// Removes a file that nobody writes any more. Ours alone: what others put there is theirs. The lock is held
+// meanwhile, so that who has just made the file sees it gone when the lock is free.
+void removeIfLeftover(int directory, const char* name) {
+  const FileDescriptor file(openat(directory, name, O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
+  struct stat status {};
+  const bool isLeftover = file && fstat(file.get(), &status) == 0 && S_ISREG(status.st_mode) &&
+                          status.st_uid == geteuid() && flock(file.get(), LOCK_EX | LOCK_NB) == 0;
+  if (isLeftover) unlinkat(directory, name, 0);
+}
+
+std::error_code copyAll(int from, int to) {
+  constexpr std::size_t kPieceBytes = std::size_t{16} << 20;
+  for (;;) {
+    const ssize_t copied = sendfile(to, from, nullptr, kPieceBytes);
+    if (copied == 0) return {};
+    if (copied < 0 && errno != EINTR) return lastSystemError();
+  }
+}
+
+// Copies the file `from` to a new one, and leaves none when that fails.
+std::error_code copyFile(const std::string& from, int directory, const std::string& name) {
+  const FileDescriptor source(open(from.c_str(), O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
+  if (!source) return lastSystemError();
+  const int descriptor =
+      openat(directory, name.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, kFileMode);
+  if (descriptor < 0) return lastSystemError();
+  std::error_code error = copyAll(source.get(), descriptor);
+  // An interrupted close() has closed all the same.
+  if (::close(descriptor) != 0 && errno != EINTR && !error) error = lastSystemError();
+  if (error) static_cast<void>(unlinkat(directory, name.c_str(), 0));
+  return error;
+}
+
+std::error_code copyAndRemove(const std::string& from, int directory, const std::string& name) {
+  if (const std::error_code error = copyFile(from, directory, name)) return error;
+  if (unlink(from.c_str()) == 0) return {};
+  const std::error_code error = lastSystemError();
+  static_cast<void>(unlinkat(directory, name.c_str(), 0));
+  return error;
+}
+
+}  // namespace
+
+std::error_code LinuxFileSystem::createDirectories(const std::string& path, unsigned mode) {
+  if (path.find('\0') != std::string::npos) return std::make_error_code(std::errc::invalid_argument);
+  if (isDirectory(path)) return {};
+  for (std::size_t slash = path.find('/', 1);; slash = path.find('/', slash + 1)) {
+    if (const std::error_code error = createDirectory(path.substr(0, slash), static_cast<mode_t>(mode))) {
+      return error;
+    }
+    if (slash == std::string::npos) return {};
+  }
+}
+
+std::unique_ptr<NewFile> LinuxFileSystem::createFile(const std::string& directory, const std::string& name,
+                                                     std::error_code& error) {
+  error.clear();
+  if (!isPlainName(name)) {
+    error = std::make_error_code(std::errc::invalid_argument);
+    return nullptr;
+  }
+  FileDescriptor parent(open(directory.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  struct stat status {};
+  const bool isTaken = parent && fstatat(parent.get(), name.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0;
+  if (isTaken) {
+    error = std::make_error_code(std::errc::file_exists);
+  } else if (!parent || errno != ENOENT) {
+    error = lastSystemError();
+  }
+  if (error) return nullptr;
+  removeLeftovers(directory, parent.get());
+  return HiddenFile::make(std::move(parent), error);
+}
+
+void LinuxFileSystem::removeLeftovers(const std::string& path, int directory) {
+  {
+    const std::lock_guard lock(mutex_);
+    if (!swept_.insert(path).second) return;
+  }
+  std::error_code error;  // a directory that cannot be read keeps what it has
+  for (std::filesystem::directory_iterator at(path, error), end; !error && at != end; at.increment(error)) {
+    const std::string name = at->path().filename().string();
+    if (name.starts_with(kHiddenPrefix)) removeIfLeftover(directory, name.c_str());
+  }
+}
+
+bool LinuxFileSystem::exists(const std::string& path) const {
+  struct stat status {};
+  return path.find('\0') == std::string::npos && stat(path.c_str(), &status) == 0;
+}
+
+std::error_code LinuxFileSystem::readFile(const std::string& path, std::string& text) const {
+  if (path.find('\0') != std::string::npos) return std::make_error_code(std::errc::invalid_argument);
+  return readFileBytes(path, text);
+}
+
+std::error_code LinuxFileSystem::moveFile(const std::string& from, const std::string& directory,
+                                          const std::string& name) {
+  if (!isPlainName(name)) return std::make_error_code(std::errc::invalid_argument);
+  struct stat status {};
+  if (lstat(from.c_str(), &status) != 0) return lastSystemError();
+  if (!S_ISREG(status.st_mode)) return std::make_error_code(std::errc::operation_not_permitted);
+  const FileDescriptor parent(open(directory.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
+  if (!parent) return lastSystemError();
+  const std::error_code error = renameToNew(AT_FDCWD, from, parent.get(), name);
+  const bool needsCopy = error == std::errc::cross_device_link || error == kCannotKeep;
+  return needsCopy ? copyAndRemove(from, parent.get(), name) : error;
+}
+
+}  // namespace tonewerk

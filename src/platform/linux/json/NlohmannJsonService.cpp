@@ -1,0 +1,200 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/json/NlohmannJsonService.h"
+
+#include <cmath>
+#include <limits>
+#include <nlohmann/json.hpp>
+
+#include "values/CompactJson.h"
+
+namespace tonewerk {
+namespace {
+
+using Json = nlohmann::ordered_json;
+
+constexpr int kMostDepth = 200;
+
+// Where in a tree of values one stands, for words about it: "a.b[2]".
+class Path {
+ public:
+  std::string text() const { return text_.empty() ? "the value" : text_; }
+
+  // Runs `step` one level down.
+  template <typename Step>
+  auto within(std::string_view key, Step step) {
+    return below((text_.empty() ? "" : ".") + std::string(key), step);
+  }
+  template <typename Step>
+  auto within(std::size_t index, Step step) {
+    return below("[" + std::to_string(index) + "]", step);
+  }
+  int depth() const { return depth_; }
+
+ private:
+  template <typename Step>
+  auto below(const std::string& part, Step step) {
+    const std::size_t size = text_.size();
+    text_ += part;
+    ++depth_;
+    auto result = step();
+    --depth_;
+    text_.resize(size);
+    return result;
+  }
+
+  std::string text_;
+  int depth_ = 0;
+};
+
+// Writes straight into the text: a tree of the library's in between would cost several times as much, and a
+// session's file holds each of its messages.
+class PrettyWriter {
+ public:
+  explicit PrettyWriter(std::string& out) : out_(out) {}
+
+  // False when something cannot be said; problem() then names it.
+  bool write(const ValueMap& map) {
+    return writeList('{', '}', map, [this](const ValueMap::Entry& entry, std::size_t) {
+      appendCompactJson(out_, Value(entry.key));
+      out_ += ": ";
+      return write(entry.value) || isWithin(entry.key.string());
+    });
+  }
+  std::string problem() const { return place_ + " is " + unsaid_ + ", which JSON cannot say"; }
+
+ private:
+  bool write(const Value& value) {
+    if (const ValueMap* map = value.asMap()) return write(*map);
+    if (const ValueArray* array = value.asArray()) {
+      return writeList('[', ']', *array, [this](const Value& element, std::size_t index) {
+        return write(element) || isWithin("[" + std::to_string(index) + "]");
+      });
+    }
+    const double* number = value.asDouble();
+    if (number != nullptr && !std::isfinite(*number)) {
+      unsaid_ = value.text();
+      return false;
+    }
+    appendCompactJson(out_, value);
+    return true;
+  }
+
+  template <typename List, typename WriteElement>
+  bool writeList(char open, char close, const List& list, WriteElement writeElement) {
+    out_ += open;
+    indentation_ += 2;
+    std::size_t index = 0;
+    for (const auto& element : list) {
+      if (index > 0) out_ += ',';
+      startLine();
+      if (!writeElement(element, index++)) return false;
+    }
+    indentation_ -= 2;
+    if (!list.empty()) startLine();
+    out_ += close;
+    return true;
+  }
+
+  void startLine() {
+    out_ += '\n';
+    out_.append(indentation_, ' ');
+  }
+
+  // On the way back out of what cannot be said: its place is within `part`. Always false.
+  bool isWithin(const std::string& part) {
+    const bool needsDot = !place_.empty() && place_.front() != '[';
+    place_ = part + (needsDot ? "." : "") + place_;
+    return false;
+  }
+
+  std::string& out_;
+  std::size_t indentation_ = 0;
+  std::string place_;   // as "a.b[2]"
+  std::string unsaid_;  // "nan" or an infinity
+};
+
+std::optional<Value> valueOf(const Json& json, Path& path, std::string& problem);
+
+std::optional<Value> arrayOf(const Json& json, Path& path, std::string& problem) {
+  ValueArray array;
+  for (const Json& element : json) {
+    std::optional<Value> value = path.within(array.size(), [&] { return valueOf(element, path, problem); });
+    if (!value) return std::nullopt;
+    array.append(std::move(*value));
+  }
+  return Value(std::move(array));
+}
+
+std::optional<Value> mapOf(const Json& json, Path& path, std::string& problem) {
+  ValueMap map;
+  for (const auto& entry : json.items()) {
+    std::optional<Value> value =
+        path.within(entry.key(), [&] { return valueOf(entry.value(), path, problem); });
+    if (!value) return std::nullopt;
+    map.set(entry.key(), std::move(*value));
+  }
+  return Value(std::move(map));
+}
+
+Value integerOf(std::uint64_t number) {
+  constexpr auto kMostSigned = static_cast<std::uint64_t>(std::numeric_limits<std::int64_t>::max());
+  return number > kMostSigned ? Value(number) : Value(static_cast<std::int64_t>(number));
+}
+
+std::optional<Value> valueOf(const Json& json, Path& path, std::string& problem) {
+  if (path.depth() > kMostDepth) {
+    problem = "values are nested deeper than " + std::to_string(kMostDepth);
+    return std::nullopt;
+  }
+  switch (json.type()) {
+    case Json::value_t::boolean:
+      return Value(json.get<bool>());
+    case Json::value_t::number_integer:
+      return Value(json.get<std::int64_t>());
+    case Json::value_t::number_unsigned:
+      return integerOf(json.get<std::uint64_t>());
+    case Json::value_t::number_float:
+      return Value(json.get<double>());
+    case Json::value_t::string:
+      return Value(json.get_ref<const std::string&>());
+    case Json::value_t::array:
+      return arrayOf(json, path, problem);
+    case Json::value_t::object:
+      return mapOf(json, path, problem);
+    default:
+      problem = path.text() + " is null";
+      return std::nullopt;
+  }
+}
+
+// The library's words without the name of its exception in brackets.
+std::string wordsOf(const Json::exception& error) {
+  const std::string text = error.what();
+  const std::size_t bracket = text.find("] ");
+  return bracket == std::string::npos ? text : text.substr(bracket + 2);
+}
+
+}  // namespace
+
+std::string NlohmannJsonService::compact(const ValueMap& map) const { return map.text(); }
+
+std::optional<std::string> NlohmannJsonService::pretty(const ValueMap& map, std::string& problem) const {
+  std::string text;
+  PrettyWriter writer(text);
+  if (writer.write(map)) return text;
+  problem = writer.problem();
+  return std::nullopt;
+}
+
+std::optional<Value> NlohmannJsonService::parse(std::string_view text, std::string& problem) const {
+  try {
+    const Json json = Json::parse(text);
+    Path path;
+    return valueOf(json, path, problem);
+  } catch (const Json::exception& error) {
+    problem = wordsOf(error);
+    return std::nullopt;
+  }
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,28 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/log/RememberingLog.h"
+
+#include <string>
+#include <utility>
+
+#include "platform/Clock.h"
+#include "platform/linux/files/Utf8.h"
+#include "platform/linux/log/RecentLines.h"
+#include "platform/linux/log/StreamLog.h"
+
+namespace tonewerk {
+
+RememberingLog::RememberingLog(std::unique_ptr<Log> log, std::shared_ptr<RecentLines> lines,
+                               const Clock& clock)
+    : log_(std::move(log)), lines_(std::move(lines)), clock_(clock) {}
+
+RememberingLog::~RememberingLog() = default;
+
+void RememberingLog::write(std::string_view subsystem, std::string_view category, LogLevel level,
+                           std::string_view message) {
+  // Lines quote what tools, files and directories say.
+  const std::string text = validUtf8(std::string(message));
+  log_->write(subsystem, category, level, text);
+  lines_->add(StreamLog::format(clock_.now(), category, level, text));
+}
+
+}  // namespace tonewerk

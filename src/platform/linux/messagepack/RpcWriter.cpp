@@ -1,0 +1,130 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/messagepack/RpcWriter.h"
+
+#include <algorithm>
+#include <cstddef>
+
+#include "platform/linux/messagepack/RpcLimits.h"
+#include "platform/linux/messagepack/RpcPacker.h"
+#include "values/Nesting.h"
+
+namespace tonewerk {
+namespace {
+
+class ValuePacker : public RpcPacker<StringOutput> {
+ public:
+  using RpcPacker::RpcPacker;
+
+  void value(const Value& value) {
+    switch (value.kind()) {
+      case Value::Kind::kBoolean:
+        pack(*value.asBoolean());
+        return;
+      case Value::Kind::kInteger:
+        pack_int64(*value.asInteger());
+        return;
+      case Value::Kind::kUnsigned:
+        pack_uint64(*value.asUnsigned());
+        return;
+      case Value::Kind::kDouble:
+        number(*value.asDouble());
+        return;
+      case Value::Kind::kString:
+        text(*value.asString());
+        return;
+      case Value::Kind::kDate:
+        date(*value.asDate());
+        return;
+      case Value::Kind::kArray:
+        array(*value.asArray());
+        return;
+      case Value::Kind::kMap:
+        map(*value.asMap());
+        return;
+    }
+  }
+
+  void valueOrNil(const std::optional<Value>& held) {
+    if (held) {
+      value(*held);
+    } else {
+      pack_nil();
+    }
+  }
+
+  void arguments(const Arguments& arguments) {
+    pack_array(static_cast<std::uint32_t>(arguments.size()));
+    for (const Argument& argument : arguments) valueOrNil(argument);
+  }
+
+  void error(const ReplyError& error) {
+    pack_map(error.message.empty() ? 2 : 3);
+    text("domain");
+    text(error.domain);
+    text("code");
+    pack_int64(error.code);
+    if (error.message.empty()) return;
+    text("message");
+    text(error.message);
+  }
+
+ private:
+  void array(const ValueArray& array) {
+    pack_array(static_cast<std::uint32_t>(array.size()));
+    for (const Value& element : array) value(element);
+  }
+
+  void map(const ValueMap& map) {
+    pack_map(static_cast<std::uint32_t>(map.size()));
+    for (const ValueMapEntry& entry : map) {
+      text(entry.key);
+      value(entry.value);
+    }
+  }
+};
+
+}  // namespace
+
+void RpcWriter::request(std::uint32_t identifier, std::string_view method, const Arguments& arguments) {
+  StringOutput output{out_};
+  ValuePacker packer(output);
+  packer.pack_array(4);
+  packer.pack_uint8(0);
+  packer.pack_uint32(identifier);
+  packer.text(method);
+  packer.arguments(arguments);
+}
+
+void RpcWriter::notification(std::string_view method, const Arguments& arguments) {
+  StringOutput output{out_};
+  ValuePacker packer(output);
+  packer.pack_array(3);
+  packer.pack_uint8(2);
+  packer.text(method);
+  packer.arguments(arguments);
+}
+
+void RpcWriter::response(std::uint32_t identifier, const std::optional<ReplyError>& error,
+                         const std::optional<Value>& result) {
+  StringOutput output{out_};
+  ValuePacker packer(output);
+  packer.pack_array(4);
+  packer.pack_uint8(1);
+  packer.pack_uint32(identifier);
+  if (error) {
+    packer.error(*error);
+    packer.pack_nil();
+  } else {
+    packer.pack_nil();
+    packer.valueOrNil(result);
+  }
+}
+
+bool fitsFrameDepth(const Arguments& arguments) {
+  constexpr std::size_t kFrameAndArguments = 2;
+  return std::all_of(arguments.begin(), arguments.end(), [](const Argument& argument) {
+    return !argument || nestsWithin(*argument, kMostFrameDepth - kFrameAndArguments);
+  });
+}
+
+}  // namespace tonewerk

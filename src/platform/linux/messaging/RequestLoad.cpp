@@ -1,0 +1,40 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/messaging/RequestLoad.h"
+
+#include "platform/linux/messagepack/RpcLimits.h"
+
+namespace tonewerk {
+
+void RequestLoad::finished(std::size_t bytes) {
+  finishedBytes_.fetch_add(bytes);
+  // In one total order with hasRoom(): either this sees what the I/O thread waits for, or that sees this.
+  if (finishedRequests_.fetch_add(1) + 1 == wakeAt_.load()) waker_->wake(connection_);
+}
+
+RequestToken RequestLoad::start(std::size_t bytes) {
+  ++startedRequests_;
+  startedBytes_ += bytes;
+  return {shared_from_this(), bytes};
+}
+
+bool RequestLoad::isBelowBound(std::size_t otherBytes) const {
+  return startedRequests_ - knownFinishedRequests_ < kMostUnfinishedRequests &&
+         startedBytes_ - knownFinishedBytes_ + otherBytes < kMostUnfinishedBytes;
+}
+
+bool RequestLoad::hasRoom(std::size_t otherBytes) {
+  while (!isBelowBound(otherBytes)) {
+    knownFinishedRequests_ = finishedRequests_.load();
+    knownFinishedBytes_ = finishedBytes_.load();
+    if (isBelowBound(otherBytes)) return true;
+    const std::uint64_t unfinished = startedRequests_ - knownFinishedRequests_;
+    if (unfinished == 0)
+      return false;  // the other bytes alone are too many; their way out is not watched here
+    const std::uint64_t awaited = knownFinishedRequests_ + (unfinished + 1) / 2;
+    wakeAt_.store(awaited);
+    if (finishedRequests_.load() < awaited) return false;
+  }
+  return true;
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,43 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <atomic>
+#include <chrono>
+#include <memory>
+#include <string>
+
+#include "platform/linux/otlp/HttpClient.h"
+
+namespace tonewerk {
+
+// HTTP by libcurl: connections are kept, certificates verified, only http and https spoken.
+class CurlHttpClient final : public HttpClient {
+ public:
+  struct Timeouts {
+    std::chrono::milliseconds connect{10'000};
+    std::chrono::milliseconds whole{30'000};
+  };
+
+  explicit CurlHttpClient(std::string userAgent);
+  CurlHttpClient(std::string userAgent, const Timeouts& timeouts);
+  CurlHttpClient(const CurlHttpClient&) = delete;
+  CurlHttpClient& operator=(const CurlHttpClient&) = delete;
+  ~CurlHttpClient() override;
+
+  HttpAnswer post(const HttpRequest& request) override;
+  void cancel() override;
+
+ private:
+  struct Handles;
+
+  const std::string userAgent_;
+  const Timeouts timeouts_;
+  std::unique_ptr<Handles> handles_;
+  std::atomic<bool> isCancelled_ = false;
+};
+
+// "<base>/v1/logs" for the base address of an endpoint, which is an http or https URL with a host and neither
+// user, query nor fragment. Empty, with a problem, for anything else.
+std::string otlpLogsAddressOf(const std::string& base, std::string& problem);
+
+}  // namespace tonewerk

@@ -1,0 +1,174 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/otlp/LinuxLinkReport.h"
+
+#include <algorithm>
+#include <random>
+#include <utility>
+#include <vector>
+
+#include "platform/Clock.h"
+#include "platform/LogLine.h"
+#include "platform/PreferenceStore.h"
+#include "platform/linux/otlp/HttpClient.h"
+#include "platform/linux/otlp/LinkReportBackends.h"
+#include "platform/linux/store/ReportStore.h"
+#include "platform/linux/system/HostIdentifier.h"
+
+namespace tonewerk {
+namespace {
+
+constexpr const char* kServiceName = "com.orvane.tonewerk";
+
+// Exporters that sessions once used stay, also when the preference names others later.
+constexpr std::size_t kMostExporters = 2 * LinkReportBackends::kMostEndpoints;
+
+std::function<double()> systemJitter() {
+  return [engine = std::mt19937(std::random_device()())]() mutable {
+    return std::uniform_real_distribution<double>(0.0, 1.0)(engine);
+  };
+}
+
+}  // namespace
+
+class LinuxLinkReport::Session final : public LinkReportSession {
+ public:
+  Session(LinuxLinkReport& service, const ValueMap& sessionInfo, const ValueMap& userInfo)
+      : service_(service),
+        sessionIdentifier_(sessionInfo.integer(kLinkReportSessionInfoSessionID)),
+        urgency_(sessionInfo.boolean(kLinkReportSessionInfoBatchEvent) ? OtlpOutbox::Urgency::kBatched
+                                                                       : OtlpOutbox::Urgency::kAtOnce),
+        eventName_(userInfo.text(kLinkReportUserInfoServiceName)),
+        stored_(std::make_shared<RtcSessionRecord>()) {
+    stored_->sessionInfo = sessionInfo;
+    stored_->userInfo = userInfo;
+  }
+
+  void startConfigurationWithCompletionHandler(CompletionHandler handler) override {
+    const LinkReportBackends backends = service_.readBackends();
+    isLocal_ = backends.local;
+    exporters_.clear();
+    for (const auto& endpoint : backends.endpoints) {
+      if (OtlpExporter* exporter = service_.exporterFor(endpoint.url)) exporters_.push_back(exporter);
+    }
+    repeatsEventName_ = booleanPreference(kEventNameAttributeKey);
+    if (isLocal_) {
+      stored_->startedAt = service_.clock_.now();
+      service_.store_.record(RtcSessionRow{stored_});
+    }
+    handler(backends.names());
+  }
+
+  bool sendMessageWithCategory(std::uint16_t category, std::uint16_t type, const ValueMap& payload,
+                               std::string& problem) override {
+    const std::size_t bytes = payload.bytes();
+    if (bytes > kMostPayloadBytes) {
+      problem = "a payload of " + std::to_string(bytes) + " bytes is too large";
+      return false;
+    }
+    const double now = service_.clock_.now();
+    if (isLocal_) service_.store_.record(RtcMessageRow{now, stored_, category, type, payload});
+    // A full outbox counts and logs what it drops itself, or there would be a line a message.
+    if (!exporters_.empty()) exportMessage(now, category, type, payload);
+    return true;
+  }
+
+  void flushMessages() override {
+    for (OtlpExporter* exporter : exporters_) exporter->flush();
+  }
+
+  std::string description() const override { return eventName_ + " " + std::to_string(sessionIdentifier_); }
+
+ private:
+  void exportMessage(double now, std::uint16_t category, std::uint16_t type, const ValueMap& payload) {
+    OtlpLogRecord record;
+    record.time = now;
+    record.identifier = service_.identifiers_.next(now);
+    record.eventName = eventName_;
+    record.sessionIdentifier = sessionIdentifier_;
+    record.category = category;
+    record.type = type;
+    record.payload = payload;
+    record.repeatsEventName = repeatsEventName_;
+    for (OtlpExporter* exporter : exporters_) exporter->add(record, urgency_);
+  }
+
+  bool booleanPreference(std::string_view key) const {
+    const std::optional<Value> value = service_.preferences_.read(kPreferenceDomain, key);
+    return value && value->boolean();
+  }
+
+  LinuxLinkReport& service_;
+  const std::int64_t sessionIdentifier_;
+  const OtlpOutbox::Urgency urgency_;
+  const std::string eventName_;
+  const std::shared_ptr<RtcSessionRecord> stored_;
+  bool isLocal_ = false;
+  std::vector<OtlpExporter*> exporters_;  // the service's
+  bool repeatsEventName_ = false;
+};
+
+LinuxLinkReport::LinuxLinkReport(ReportStore& store, const PreferenceStore& preferences, const Clock& clock,
+                                 const LogCategory& log, std::string version, HttpClientMaker makeClient,
+                                 const OtlpOutbox::Limits& limits)
+    : store_(store),
+      preferences_(preferences),
+      clock_(clock),
+      log_(log),
+      ownResource_{kServiceName, std::move(version), hostIdentifier(), {}},
+      makeClient_(std::move(makeClient)),
+      limits_(limits) {}
+
+LinuxLinkReport::~LinuxLinkReport() = default;
+
+// The parent's place is in front of the token's own: a token tells the way from the root.
+std::optional<std::string> LinuxLinkReport::newHierarchyTokenFromParentToken(
+    const std::optional<std::string>& parentToken) {
+  const std::string token = identifiers_.next(clock_.now());
+  return parentToken ? *parentToken + "/" + token : token;
+}
+
+std::unique_ptr<LinkReportSession> LinuxLinkReport::initWithSessionInfo(
+    const ValueMap& sessionInfo, const ValueMap& userInfo, const ValueArray* /*frameworksToCheck*/) {
+  return std::make_unique<Session>(*this, sessionInfo, userInfo);
+}
+
+LinkReportBackends LinuxLinkReport::readBackends() {
+  LinkReportBackends backends = LinkReportBackends::from(preferences_.read(kPreferenceDomain, kBackendsKey));
+  std::string problems;
+  for (const std::string& problem : backends.problems) problems += problem + "; ";
+  if (!problems.empty() && problems != loggedProblems_) {
+    errorLog(log_, "%@ of %@: %@left out", kBackendsKey, kPreferenceDomain, problems);
+  }
+  loggedProblems_ = std::move(problems);
+  return backends;
+}
+
+OtlpExporter* LinuxLinkReport::exporterFor(const std::string& url) {
+  const auto known = exporters_.find(url);
+  if (known != exporters_.end()) return known->second.get();
+  if (exporters_.size() >= kMostExporters) {
+    errorLog(log_, "no more than %zu addresses are sent to in one run; left out: %@", kMostExporters, url);
+    return nullptr;
+  }
+  auto exporter = std::make_unique<OtlpExporter>(
+      url, makeClient_(), [this] { return resource(); }, clock_, log_, RetryPolicy(systemJitter()), limits_);
+  return exporters_.emplace(url, std::move(exporter)).first->second.get();
+}
+
+OtlpResource LinuxLinkReport::resource() const {
+  OtlpResource resource = ownResource_;
+  // Somebody opted in by giving the device a name.
+  const std::optional<Value> device = preferences_.read(kPreferenceDomain, kDeviceIdentifierKey);
+  if (device && device->asString() != nullptr) resource.deviceIdentifier = device->text();
+  return resource;
+}
+
+bool LinuxLinkReport::finish(std::chrono::milliseconds timeout) {
+  const auto deadline = std::chrono::steady_clock::now() + timeout;
+  for (const auto& [url, exporter] : exporters_) exporter->beginEnd();
+  bool isDone = true;
+  for (const auto& [url, exporter] : exporters_) isDone = exporter->waitForEnd(deadline) && isDone;
+  return isDone;
+}
+
+}  // namespace tonewerk

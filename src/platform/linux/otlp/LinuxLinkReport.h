@@ -1,0 +1,78 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <chrono>
+#include <functional>
+#include <map>
+#include <memory>
+#include <optional>
+#include <string>
+#include <string_view>
+
+#include "platform/LinkReport.h"
+#include "platform/linux/files/Ulid.h"
+#include "platform/linux/otlp/OtlpExporter.h"
+
+namespace tonewerk {
+
+class Clock;
+class HttpClient;
+class LogCategory;
+class PreferenceStore;
+class ReportStore;
+struct LinkReportBackends;
+
+// The real-time-communication reporting service over the report store and OTLP/HTTP endpoints, whatever the
+// preferences of the domain "com.orvane.linkreport" name. docs/rtc.md says what they are and what is sent.
+//
+// Backends answer at once. An endpoint gets an exporter when a session first uses it, which stays.
+class LinuxLinkReport final : public LinkReport {
+ public:
+  static constexpr std::string_view kPreferenceDomain = "com.orvane.linkreport";
+  static constexpr std::string_view kBackendsKey = "backends";
+  static constexpr std::string_view kDeviceIdentifierKey = "device_id";
+  static constexpr std::string_view kEventNameAttributeKey = "event_name_attribute";
+  // A larger payload, which only a summary can be, is refused.
+  static constexpr std::size_t kMostPayloadBytes = std::size_t{32} << 20;
+
+  using HttpClientMaker = std::function<std::unique_ptr<HttpClient>()>;
+
+  // `version` is the daemon's. Everything referred to outlives it.
+  LinuxLinkReport(ReportStore& store, const PreferenceStore& preferences, const Clock& clock,
+                  const LogCategory& log, std::string version, HttpClientMaker makeClient,
+                  const OtlpOutbox::Limits& limits = {});
+  LinuxLinkReport(const LinuxLinkReport&) = delete;
+  LinuxLinkReport& operator=(const LinuxLinkReport&) = delete;
+  ~LinuxLinkReport() override;
+
+  std::optional<std::string> newHierarchyTokenFromParentToken(
+      const std::optional<std::string>& parentToken) override;
+  std::unique_ptr<LinkReportSession> initWithSessionInfo(const ValueMap& sessionInfo,
+                                                         const ValueMap& userInfo,
+                                                         const ValueArray* frameworksToCheck) override;
+
+  // Sends what waits for the network, for at most so long. Nothing is sent after it. False when something is
+  // left.
+  bool finish(std::chrono::milliseconds timeout);
+
+ private:
+  class Session;
+
+  LinkReportBackends readBackends();
+  // Null when there are too many already.
+  OtlpExporter* exporterFor(const std::string& url);
+  OtlpResource resource() const;
+
+  ReportStore& store_;
+  const PreferenceStore& preferences_;
+  const Clock& clock_;
+  const LogCategory& log_;
+  const OtlpResource ownResource_;
+  const HttpClientMaker makeClient_;
+  const OtlpOutbox::Limits limits_;
+  UlidGenerator identifiers_;
+  std::string loggedProblems_;
+  std::map<std::string, std::unique_ptr<OtlpExporter>> exporters_;  // by URL
+};
+
+}  // namespace tonewerk

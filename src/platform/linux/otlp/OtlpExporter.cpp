@@ -1,0 +1,75 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/otlp/OtlpExporter.h"
+
+#include <utility>
+
+#include "platform/Clock.h"
+#include "platform/linux/otlp/HttpClient.h"
+#include "platform/linux/threads/ThreadProperties.h"
+
+namespace tonewerk {
+
+OtlpExporter::OtlpExporter(std::string url, std::unique_ptr<HttpClient> client,
+                           OtlpSender::ResourceSource resource, const Clock& clock, const LogCategory& log,
+                           RetryPolicy retry, const OtlpOutbox::Limits& limits)
+    : clock_(clock),
+      client_(std::move(client)),
+      outbox_(limits),
+      sender_(std::move(url), outbox_, *client_, std::move(resource), clock, log, std::move(retry)),
+      thread_([this] { run(); }) {}
+
+OtlpExporter::~OtlpExporter() {
+  beginEnd();
+  client_->cancel();
+  thread_.join();
+  sender_.logLosses();
+}
+
+bool OtlpExporter::add(const OtlpLogRecord& record, OtlpOutbox::Urgency urgency) {
+  const OtlpOutbox::Added added = outbox_.add(otlpJsonOf(record), urgency, clock_.monotonic());
+  if (added == OtlpOutbox::Added::kChangedDue) wake();
+  return added != OtlpOutbox::Added::kDropped;
+}
+
+void OtlpExporter::flush() {
+  if (outbox_.flush()) wake();
+}
+
+void OtlpExporter::beginEnd() {
+  outbox_.flush();
+  const std::lock_guard lock(mutex_);
+  isEnding_ = true;
+  changed_.notify_all();
+}
+
+bool OtlpExporter::waitForEnd(std::chrono::steady_clock::time_point deadline) {
+  std::unique_lock lock(mutex_);
+  return changed_.wait_until(lock, deadline, [this] { return hasEnded_; });
+}
+
+void OtlpExporter::wake() {
+  const std::lock_guard lock(mutex_);
+  hasNews_ = true;
+  changed_.notify_all();
+}
+
+void OtlpExporter::run() {
+  nameThisThread("tw-otlp");
+  constexpr OtlpOutbox::Time kLongest = std::chrono::hours(1);
+  std::unique_lock lock(mutex_);
+  while (!isEnding_) {
+    hasNews_ = false;
+    lock.unlock();
+    const OtlpOutbox::Time wait = std::min(sender_.sendDue().value_or(kLongest), kLongest);
+    lock.lock();
+    changed_.wait_for(lock, wait, [this] { return hasNews_ || isEnding_; });
+  }
+  lock.unlock();
+  sender_.hurry();
+  sender_.sendDue();
+  lock.lock();
+  hasEnded_ = true;
+  changed_.notify_all();
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,166 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/otlp/OtlpSender.h"
+
+#include <algorithm>
+#include <iterator>
+#include <utility>
+
+#include "platform/Clock.h"
+#include "platform/LogLine.h"
+#include "platform/linux/files/Gzip.h"
+#include "platform/linux/otlp/OtlpAnswer.h"
+
+namespace tonewerk {
+namespace {
+
+std::string problemOf(const HttpAnswer& answer) {
+  if (answer.status == 0) return answer.problem;
+  return "HTTP status " + std::to_string(answer.status);
+}
+
+}  // namespace
+
+OtlpSender::OtlpSender(std::string url, OtlpOutbox& outbox, HttpClient& client, ResourceSource resource,
+                       const Clock& clock, const LogCategory& log, RetryPolicy retry)
+    : url_(std::move(url)),
+      outbox_(outbox),
+      client_(client),
+      resource_(std::move(resource)),
+      clock_(clock),
+      log_(log),
+      retry_(std::move(retry)) {}
+
+std::optional<OtlpOutbox::Time> OtlpSender::sendDue() {
+  for (;;) {
+    const OtlpOutbox::Time now = clock_.monotonic();
+    if (notBefore_ && *notBefore_ > now) return *notBefore_ - now;
+    notBefore_.reset();
+    if (taken_.empty()) {
+      OtlpOutbox::Batch batch = outbox_.take(now);
+      if (batch.records.empty()) {
+        const auto due = outbox_.nextDue();
+        // What was added since is due at the earliest now.
+        return due ? std::optional(std::max(*due - now, OtlpOutbox::Time(0))) : std::nullopt;
+      }
+      taken_.push_back(std::move(batch));
+    }
+    if (sendNext() == Outcome::kWait) return *notBefore_ - now;
+  }
+}
+
+OtlpSender::Outcome OtlpSender::sendNext() {
+  const HttpAnswer answer = post(taken_.front());
+  switch (RetryPolicy::verdictOf(answer.status)) {
+    case RetryPolicy::Verdict::kRetry:
+      return retryLater(answer);
+    case RetryPolicy::Verdict::kSplit:
+      if (taken_.front().records.size() > 1) {
+        split();
+        return Outcome::kGoOn;
+      }
+      drop(taken_.front(), "a record is too large for it");
+      break;
+    case RetryPolicy::Verdict::kDrop:
+      drop(taken_.front(), problemOf(answer));
+      break;
+    case RetryPolicy::Verdict::kDelivered:
+      delivered(taken_.front(), answer);
+      break;
+  }
+  outbox_.settle(taken_.front());
+  taken_.pop_front();
+  return Outcome::kGoOn;
+}
+
+HttpAnswer OtlpSender::post(const OtlpOutbox::Batch& batch) {
+  HttpRequest request;
+  request.url = url_;
+  request.headers = {"Content-Type: application/json"};
+  request.body = otlpRequestOf(resource_(), batch.records);
+  if (auto packed = gzip(request.body)) {
+    request.body = std::move(*packed);
+    request.headers.emplace_back("Content-Encoding: gzip");
+  }
+  return client_.post(request);
+}
+
+void OtlpSender::delivered(const OtlpOutbox::Batch& batch, const HttpAnswer& answer) {
+  retry_.succeeded();
+  const std::uint64_t full = outbox_.takeDropped();
+  allDropped_ += full;
+  const std::uint64_t dropped = std::exchange(dropped_, 0) + full;
+  if (!std::exchange(loggedProblem_, {}).empty() || dropped > 0) {
+    errorLog(log_, "sending to %@ goes on; records dropped meanwhile: %lu", url_, dropped);
+  }
+  takeAnswer(batch, answer);
+}
+
+// Whatever the body holds, the status has said that the records are taken.
+void OtlpSender::takeAnswer(const OtlpOutbox::Batch& batch, const HttpAnswer& answer) {
+  std::string complaint;
+  const std::optional<OtlpAnswer> said = parseOtlpAnswer(answer.body);
+  if (!answer.problem.empty()) {
+    complaint = "its answer is not whole: " + answer.problem;
+  } else if (!said) {
+    complaint = "its answer cannot be read";
+  } else if (said->rejectedRecords > 0) {
+    const auto claimed = static_cast<std::uint64_t>(said->rejectedRecords);
+    const std::uint64_t rejected = std::min<std::uint64_t>(claimed, batch.records.size());
+    allDropped_ += rejected;
+    errorLog(log_, "%@ rejected records: %lu (%@)", url_, rejected, quotable(said->message));
+  } else if (!said->message.empty()) {
+    defaultLog(log_, "%@ says: %@", url_, quotable(said->message));
+  }
+  if (!complaint.empty() && complaint != loggedComplaint_) errorLog(log_, "%@: %@", url_, complaint);
+  loggedComplaint_ = std::move(complaint);
+}
+
+OtlpSender::Outcome OtlpSender::retryLater(const HttpAnswer& answer) {
+  std::optional<std::chrono::seconds> asked;
+  if (answer.status != 0) asked = parseRetryAfter(answer.retryAfter, clock_.now());
+  waitIsAsked_ = asked.has_value();
+  notBefore_ = clock_.monotonic() + retry_.delayAfterFailure(asked);
+  logOnce(problemOf(answer) + "; records are kept while there is room");
+  return Outcome::kWait;
+}
+
+// The first half goes next. Room is accounted for by records, so that both halves together give back the
+// whole.
+void OtlpSender::split() {
+  OtlpOutbox::Batch whole = std::move(taken_.front());
+  taken_.pop_front();
+  OtlpOutbox::Batch second;
+  const auto middle = whole.records.begin() + static_cast<std::ptrdiff_t>(whole.records.size() / 2);
+  second.records.assign(std::make_move_iterator(middle), std::make_move_iterator(whole.records.end()));
+  whole.records.erase(middle, whole.records.end());
+  second.bytes = whole.bytes / 2;
+  whole.bytes -= second.bytes;
+  taken_.push_front(std::move(second));
+  taken_.push_front(std::move(whole));
+}
+
+void OtlpSender::drop(const OtlpOutbox::Batch& batch, const std::string& why) {
+  retry_.succeeded();  // it answers
+  dropped_ += batch.records.size();
+  allDropped_ += batch.records.size();
+  logOnce(why + "; what it refuses is dropped");
+}
+
+void OtlpSender::logOnce(const std::string& problem) {
+  if (problem == loggedProblem_) return;
+  loggedProblem_ = problem;
+  errorLog(log_, "sending to %@: %@", url_, problem);
+}
+
+void OtlpSender::hurry() {
+  if (!waitIsAsked_) notBefore_.reset();
+}
+
+void OtlpSender::logLosses() {
+  allDropped_ += outbox_.takeDropped();
+  const std::size_t lost = outbox_.count();
+  if (lost > 0) errorLog(log_, "records lost that could not be sent to %@: %zu", url_, lost);
+  if (allDropped_ > 0) errorLog(log_, "records for %@ dropped in all: %lu", url_, allDropped_);
+}
+
+}  // namespace tonewerk

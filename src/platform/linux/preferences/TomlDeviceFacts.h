@@ -1,0 +1,29 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <mutex>
+#include <string>
+
+#include "platform/DeviceFacts.h"
+#include "platform/LogCategory.h"
+#include "platform/linux/preferences/TomlFile.h"
+
+namespace tonewerk {
+
+// Facts out of a TOML file, read when it is made and when somebody asks for it. A missing file states none;
+// one that does not parse is logged and states none.
+class TomlDeviceFacts final : public DeviceFacts {
+ public:
+  // `log` outlives the facts.
+  TomlDeviceFacts(std::string path, const LogCategory& log);
+
+  std::optional<bool> boolean(std::string_view property) const override;
+
+  void readAgain();
+
+ private:
+  mutable std::mutex mutex_;  // guards the file
+  TomlFile file_;
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,80 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/socket/ReplyOutbox.h"
+
+#include <cerrno>
+#include <sys/socket.h>
+#include <utility>
+
+#include "platform/linux/messagepack/RpcWriter.h"
+
+namespace tonewerk {
+namespace {
+
+// A buffer that has grown past this is not kept.
+constexpr std::size_t kMostKeptBytes = std::size_t{64} * 1024;
+// With so much unsent the connection may have stopped reading requests, and wants to know that it is gone.
+constexpr std::size_t kNotableBytes = std::size_t{64} * 1024;
+
+}  // namespace
+
+void ReplyOutbox::reply(std::uint32_t requestIdentifier, const std::optional<ReplyError>& error,
+                        const std::optional<Value>& result) {
+  {
+    const std::lock_guard lock(mutex_);
+    if (isClosed_ || state_ == State::kRefused) return;
+    RpcWriter(unsent_).response(requestIdentifier, error, result);
+    unsentBytes_ = unsent_.size() - sent_;
+    if (isPutOff_ || state_ == State::kFull) return;  // somebody is about to send, or waits to
+    isPutOff_ = true;
+  }
+  if (!WorkBatch::putOff(shared_from_this())) endOfBatch();
+}
+
+void ReplyOutbox::endOfBatch() {
+  bool mustWake = false;
+  {
+    const std::lock_guard lock(mutex_);
+    isPutOff_ = false;
+    if (isClosed_ || state_ != State::kOpen) return;
+    const std::size_t before = unsent_.size();
+    sendUnsent();
+    mustWake = state_ != State::kOpen || before >= kNotableBytes;
+  }
+  if (mustWake) waker_->wake(connection_);
+}
+
+ReplyOutbox::State ReplyOutbox::goOn() {
+  const std::lock_guard lock(mutex_);
+  if (!isClosed_ && state_ == State::kFull) sendUnsent();
+  return state_;
+}
+
+void ReplyOutbox::close() {
+  const std::lock_guard lock(mutex_);
+  if (isClosed_) return;
+  if (state_ != State::kRefused) sendUnsent();
+  isClosed_ = true;
+  unsent_ = {};
+  sent_ = 0;
+}
+
+void ReplyOutbox::sendUnsent() {
+  state_ = State::kOpen;
+  while (sent_ < unsent_.size() && state_ == State::kOpen) {
+    const ssize_t count =
+        ::send(socket_, unsent_.data() + sent_, unsent_.size() - sent_, MSG_DONTWAIT | MSG_NOSIGNAL);
+    if (count >= 0) {
+      sent_ += static_cast<std::size_t>(count);
+    } else if (errno != EINTR) {
+      state_ = errno == EAGAIN ? State::kFull : State::kRefused;
+    }
+  }
+  if (state_ != State::kFull) {
+    sent_ = 0;
+    unsent_.clear();
+    if (unsent_.capacity() > kMostKeptBytes) unsent_ = {};
+  }
+  unsentBytes_ = unsent_.size() - sent_;
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,100 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <functional>
+#include <memory>
+#include <optional>
+#include <span>
+#include <string>
+#include <string_view>
+
+#include "platform/LogCategory.h"
+#include "platform/MessagingConnection.h"
+#include "platform/linux/files/Epoll.h"
+#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/messagepack/RpcFrameReader.h"
+#include "platform/linux/messaging/RequestLoad.h"
+#include "platform/linux/socket/ReplyOutbox.h"
+#include "platform/linux/threads/IoWaker.h"
+
+namespace tonewerk {
+
+class AllocatorReclaimer;
+
+// What the connections of one I/O thread share.
+struct UnixConnectionContext {
+  Epoll& epoll;
+  std::shared_ptr<IoWaker> waker;
+  RpcTexts& texts;
+  std::span<char> readBuffer;
+  const LogCategory& log;
+  std::uint32_t owner;         // who may use what is for the daemon's own user
+  AllocatorReclaimer* memory;  // told of what clients bring, and of their ends; may be null
+};
+
+// One client's socket, on the I/O thread.
+//
+//   socket -> readBuffer -> RpcFrameReader -> exported object      as long as there is room for requests
+//   socket <- ReplyOutbox <- replies of any thread
+//
+// A connection without room is paused: what was read and not used waits in rest_, and the socket is not
+// looked at.
+class UnixConnection final : public MessagingConnection {
+ public:
+  // `context` outlives the connection. `identifier` is its number in the epoll and the waker.
+  UnixConnection(const UnixConnectionContext& context, std::uint64_t identifier, FileDescriptor socket);
+  ~UnixConnection() override;
+
+  std::int32_t processIdentifier() const override { return processIdentifier_; }
+  std::uint32_t userIdentifier() const override { return userIdentifier_; }
+  std::string description() const override;
+  void exportObject(const ExportedInterface& interface, std::shared_ptr<ExportedObject> object) override;
+  void setInterruptionHandler(std::function<void()> handler) override { interrupted_ = std::move(handler); }
+  void setInvalidationHandler(std::function<void()> handler) override { invalidated_ = std::move(handler); }
+  void resume() override;
+
+  // The socket is ready for `events`.
+  void handleEvents(std::uint32_t events);
+  // Replies wait, or there is room again.
+  void handleWake();
+  // Ends the connection; its handlers have returned when this does. Once; later calls do nothing.
+  void end();
+  bool hasEnded() const { return hasEnded_; }
+
+ private:
+  void receive();
+  // Takes frames off `bytes` until they or the room are used up.
+  void process(std::string_view bytes);
+  void dispatch(RpcFrame& frame);
+  std::optional<ReplyError> problemWithFrame(const RpcFrame& frame, std::optional<std::size_t> method) const;
+  void endAsBroken(std::string_view problem);
+  void updateInterest();
+  bool hasRoom() { return load_->hasRoom(outbox_->unsentBytes()); }
+
+  const UnixConnectionContext& context_;
+  const std::uint64_t identifier_;
+  FileDescriptor socket_;
+  std::int32_t processIdentifier_ = 0;
+  std::uint32_t userIdentifier_ = kNoUser;
+
+  const ExportedInterface* interface_ = nullptr;
+  std::shared_ptr<ExportedObject> object_;
+  std::function<void()> interrupted_;
+  std::function<void()> invalidated_;
+  bool isResumed_ = false;
+  bool hasEnded_ = false;
+
+  RpcFrameReader reader_;
+  std::shared_ptr<RequestLoad> load_;
+  bool isPaused_ = false;
+  std::string rest_;
+
+  std::shared_ptr<ReplyOutbox> outbox_;
+  // As last seen. Of a peer that refuses replies everything received is read, and then the connection ends.
+  ReplyOutbox::State replies_ = ReplyOutbox::State::kOpen;
+  std::uint32_t interest_ = 0;  // what the epoll has been told
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,182 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/socket/UnixSocketListener.h"
+
+#include <algorithm>
+#include <cassert>
+#include <cerrno>
+#include <pthread.h>
+#include <string>
+#include <sys/resource.h>
+#include <sys/socket.h>
+#include <system_error>
+#include <utility>
+
+#include "platform/LogLine.h"
+#include "platform/linux/threads/WorkBatch.h"
+
+namespace tonewerk {
+namespace {
+
+// Connections accepted in one round, before those that are there have their turn.
+constexpr int kMostAcceptsAtOnce = 16;
+
+std::size_t descriptorsForClients() {
+  rlimit limit{};
+  if (::getrlimit(RLIMIT_NOFILE, &limit) != 0 || limit.rlim_cur == RLIM_INFINITY) return SIZE_MAX;
+  const auto all = static_cast<std::size_t>(limit.rlim_cur);
+  return all - std::min(all / 2, UnixSocketListener::kReservedDescriptors);
+}
+
+}  // namespace
+
+UnixSocketListener::UnixSocketListener(std::unique_ptr<ServerSocket> socket, const LogCategory& log,
+                                       std::unique_ptr<WatchdogFeeder> watchdog, std::uint32_t owner,
+                                       AllocatorReclaimer* memory)
+    : socket_(std::move(socket)),
+      log_(log),
+      readBuffer_(kReadBytes),
+      context_{epoll_, waker_, texts_, readBuffer_, log_, owner, memory},
+      watchdog_(std::move(watchdog)),
+      mostConnections_(descriptorsForClients()) {}
+
+UnixSocketListener::~UnixSocketListener() { shutDown(); }
+
+void UnixSocketListener::resume() {
+  const std::lock_guard lock(lifeMutex_);
+  assert(delegate_ != nullptr);
+  if (thread_.joinable() || isStopping_) return;
+  thread_ = std::thread([this] { run(); });
+}
+
+void UnixSocketListener::shutDown() {
+  const std::lock_guard lock(lifeMutex_);
+  isStopping_ = true;
+  waker_->wake(kWaker);
+  if (thread_.joinable()) thread_.join();
+  socket_ = nullptr;
+}
+
+void UnixSocketListener::run() {
+  ::pthread_setname_np(::pthread_self(), "tw-messaging");
+  epoll_.add(socket_->fileDescriptor(), kSocket, EPOLLIN);
+  epoll_.add(waker_->fileDescriptor(), kWaker, EPOLLIN | EPOLLET);
+  infoLog(log_, "listening at %@", socket_->name());
+  while (!isStopping_) {
+    const WorkBatch round;
+    for (const Epoll::Event& event : epoll_.wait(timeToNextRound())) handle(event);
+    if (acceptAgainAt_ && std::chrono::steady_clock::now() >= *acceptAgainAt_) resumeAccepting();
+    if (watchdog_ != nullptr) watchdog_->pingIfDue();
+  }
+  endEverything();
+}
+
+void UnixSocketListener::handle(const Epoll::Event& event) {
+  if (event.identifier == kSocket) return accept();
+  if (event.identifier == kWaker) return handleWakes();
+  // A connection that ended earlier in this round is not found any more.
+  const auto found = connections_.find(event.identifier);
+  if (found == connections_.end()) return;
+  found->second->handleEvents(event.events);
+  removeIfEnded(event.identifier);
+}
+
+void UnixSocketListener::handleWakes() {
+  for (const std::uint64_t identifier : waker_->take()) {
+    const auto found = connections_.find(identifier);
+    if (found == connections_.end()) continue;
+    found->second->handleWake();
+    removeIfEnded(identifier);
+  }
+  if (mustRestore_.exchange(false)) makeSocketAgain();
+}
+
+void UnixSocketListener::restoreSocket() {
+  mustRestore_ = true;
+  waker_->wake(kWaker);
+}
+
+void UnixSocketListener::makeSocketAgain() {
+  if (socket_->isInPlace()) return;
+  std::string problem;
+  std::unique_ptr<ServerSocket> socket = socket_->madeAgain(problem);
+  if (socket == nullptr) {
+    errorLog(log_, "clients cannot connect: %@", problem);
+    return;
+  }
+  if (!acceptAgainAt_) accept();  // who found the old one
+  const bool isPaused = acceptAgainAt_.has_value();
+  if (!isPaused) epoll_.remove(socket_->fileDescriptor());
+  socket_ = std::move(socket);
+  if (!isPaused) epoll_.add(socket_->fileDescriptor(), kSocket, EPOLLIN);
+  defaultLog(log_, "%@ was gone and is made again", socket_->name());
+}
+
+void UnixSocketListener::accept() {
+  for (int count = 0; count < kMostAcceptsAtOnce; ++count) {
+    if (connections_.size() >= mostConnections_) return pauseAccepting("too many clients");
+    FileDescriptor socket(
+        ::accept4(socket_->fileDescriptor(), nullptr, nullptr, SOCK_CLOEXEC | SOCK_NONBLOCK));
+    if (socket) {
+      add(std::move(socket));
+      continue;
+    }
+    if (errno == EAGAIN) {
+      hasLoggedPause_ = false;  // nobody waits any more; the next shortage is another one
+      return;
+    }
+    // A client that gave up before its turn is no reason to stop; anything else would come again at once.
+    if (errno != EINTR && errno != ECONNABORTED)
+      return pauseAccepting(std::generic_category().message(errno));
+  }
+}
+
+void UnixSocketListener::add(FileDescriptor socket) {
+  const std::uint64_t identifier = nextIdentifier_++;
+  auto connection = std::make_unique<UnixConnection>(context_, identifier, std::move(socket));
+  infoLog(log_, "new %@", *connection);
+  if (!delegate_->listenerShouldAcceptNewConnection(*connection)) {
+    infoLog(log_, "%@ was turned away", *connection);
+    return;
+  }
+  connections_.emplace(identifier, std::move(connection));
+}
+
+void UnixSocketListener::pauseAccepting(const std::string& why) {
+  if (!hasLoggedPause_) errorLog(log_, "cannot accept another client for now: %@", why);
+  hasLoggedPause_ = true;
+  epoll_.remove(socket_->fileDescriptor());
+  acceptAgainAt_ = std::chrono::steady_clock::now() + kAcceptPause;
+}
+
+void UnixSocketListener::resumeAccepting() {
+  acceptAgainAt_.reset();
+  epoll_.add(socket_->fileDescriptor(), kSocket, EPOLLIN);
+}
+
+std::optional<std::chrono::milliseconds> UnixSocketListener::timeToNextAccept() const {
+  if (!acceptAgainAt_) return std::nullopt;
+  const auto left =
+      std::chrono::ceil<std::chrono::milliseconds>(*acceptAgainAt_ - std::chrono::steady_clock::now());
+  return std::max(left, std::chrono::milliseconds::zero());
+}
+
+std::optional<std::chrono::milliseconds> UnixSocketListener::timeToNextRound() const {
+  const auto accept = timeToNextAccept();
+  if (watchdog_ == nullptr) return accept;
+  return accept ? std::min(*accept, watchdog_->timeToNext()) : watchdog_->timeToNext();
+}
+
+void UnixSocketListener::removeIfEnded(std::uint64_t identifier) {
+  const auto found = connections_.find(identifier);
+  if (found == connections_.end() || !found->second->hasEnded()) return;
+  connections_.erase(found);
+  if (acceptAgainAt_) resumeAccepting();
+}
+
+void UnixSocketListener::endEverything() {
+  socket_ = nullptr;
+  for (const auto& [identifier, connection] : connections_) connection->end();
+  connections_.clear();
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,171 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/store/ReportStore.h"
+
+#include <algorithm>
+#include <pthread.h>
+#include <utility>
+
+#include "platform/Clock.h"
+#include "platform/LogLine.h"
+#include "platform/PreferenceStore.h"
+
+namespace tonewerk {
+namespace {
+
+constexpr double kMegabyte = 1 << 20;
+constexpr double kDaySeconds = 86'400.0;
+// A bound beyond this is no bound (a petabyte, some thousand years), and fits every type it is turned into.
+constexpr double kUnbounded = 1e9;
+
+bool isNumber(const Value& value) {
+  return value.asInteger() != nullptr || value.asUnsigned() != nullptr || value.asDouble() != nullptr;
+}
+
+}  // namespace
+
+ReportStore::ReportStore(const std::string& directory, const JsonService& json,
+                         const PreferenceStore& preferences, const Clock& clock, const LogCategory& log,
+                         const Limits& limits)
+    : preferences_(preferences),
+      clock_(clock),
+      log_(log),
+      queue_(limits),
+      database_(directory, json),
+      thread_([this] { run(); }) {}
+
+ReportStore::~ReportStore() {
+  queue_.stop();
+  thread_.join();
+  const std::uint64_t lost = queue_.lost();
+  if (lost > 0) errorLog(log_, "rows lost that could not be written to %s: %llu", database_.path(), lost);
+}
+
+void ReportStore::recordEvent(double recordedAt, const SharedString& name, ValueMap payload) {
+  record(AnalyticsRow{recordedAt, {name, SharedString()}, std::move(payload)});
+}
+
+void ReportStore::record(StoreRow row) {
+  const bool hangs = queue_.add(std::move(row));
+  if (hangs) errorLog(log_, "writing to %s hangs; what does not fit is dropped", database_.path());
+}
+
+void ReportStore::readBoundsAgain() {
+  areBoundsStale_ = true;
+  queue_.nudge();
+}
+
+bool ReportStore::flush(std::chrono::milliseconds timeout) { return queue_.flush(timeout); }
+
+void ReportStore::run() {
+  pthread_setname_np(pthread_self(), "tw-store");
+  // The file is there, and its problems are known, before the first row is.
+  queue_.attempt();
+  if (write()) {
+    queue_.committed();
+  } else {
+    queue_.failed();
+  }
+  while (queue_.take(batch_, !moreToTrim_)) {
+    if (!writeUntilDone()) return;
+  }
+}
+
+// False when the store ends without the rows being written.
+bool ReportStore::writeUntilDone() {
+  for (std::chrono::milliseconds backOff = kFirstBackOff;; backOff = std::min(2 * backOff, kLongestBackOff)) {
+    queue_.attempt();
+    if (write()) break;
+    queue_.failed();
+    if (!queue_.pause(backOff)) {
+      if (!write()) return false;
+      break;
+    }
+  }
+  // Said before who waits for the rows goes on.
+  logSuccess(queue_.takeDropped());
+  queue_.committed();
+  return true;
+}
+
+bool ReportStore::write() {
+  readBounds();
+  if (writeOrBeginAnew() != StoreDatabase::Result::kDone) {
+    logFailure();
+    return false;
+  }
+  trim();
+  return true;
+}
+
+StoreDatabase::Result ReportStore::writeOrBeginAnew() {
+  const StoreDatabase::Result result = database_.write(batch_);
+  if (result != StoreDatabase::Result::kCorrupt) return result;
+  return moveAside() ? database_.write(batch_) : StoreDatabase::Result::kFailed;
+}
+
+bool ReportStore::moveAside() {
+  errorLog(log_, "%s is damaged (%s); it is moved aside and a new one begun", database_.path(),
+           database_.problem());
+  return database_.moveAside();
+}
+
+void ReportStore::trim() {
+  const bool ageDue = std::exchange(ageDue_, false);
+  const bool wasTrimming = std::exchange(moreToTrim_, false);
+  StoreDatabase::Result result = database_.trimSize(moreToTrim_);
+  if (result == StoreDatabase::Result::kDone && (ageDue || wasTrimming)) {
+    result = database_.trimAge(clock_.now(), moreToTrim_);
+  }
+  if (result == StoreDatabase::Result::kDone) {
+    loggedTrimProblem_.clear();
+    return;
+  }
+  moreToTrim_ = false;
+  if (result == StoreDatabase::Result::kCorrupt && moveAside()) return;
+  if (loggedTrimProblem_ == database_.problem()) return;
+  loggedTrimProblem_ = database_.problem();
+  errorLog(log_, "cannot keep %s within its bounds: %s", database_.path(), loggedTrimProblem_);
+}
+
+void ReportStore::readBounds() {
+  const std::chrono::nanoseconds now = clock_.monotonic();
+  if (!areBoundsStale_.exchange(false) && now - boundsReadAt_ < kBoundsInterval) return;
+  boundsReadAt_ = now;
+  ageDue_ = true;
+  StoreBounds bounds;
+  std::string wrong;
+  bounds.bytes = static_cast<std::int64_t>(bound(kMaxMegabytesKey, 256, wrong) * kMegabyte);
+  bounds.seconds = bound(kMaxDaysKey, 30, wrong) * kDaySeconds;
+  if (!wrong.empty() && wrong != loggedWrongBounds_) {
+    errorLog(log_, "preferences of %s that are no number from 1 are left out:%s", kPreferenceDomain, wrong);
+  }
+  loggedWrongBounds_ = wrong;
+  if (bounds == bounds_) return;
+  bounds_ = bounds;
+  database_.setBounds(bounds_);
+}
+
+// The preference when it is a number from 1, else `otherwise`; one that is something else is named in
+// `wrong`.
+double ReportStore::bound(std::string_view key, double otherwise, std::string& wrong) const {
+  const std::optional<Value> value = preferences_.read(kPreferenceDomain, key);
+  if (!value) return otherwise;
+  if (isNumber(*value) && value->number() >= 1.0) return std::min(value->number(), kUnbounded);
+  wrong += " " + std::string(key) + " = " + value->text();
+  return otherwise;
+}
+
+void ReportStore::logFailure() {
+  if (loggedProblem_ == database_.problem()) return;
+  loggedProblem_ = database_.problem();
+  errorLog(log_, "cannot write %s: %s; rows are kept while there is room", database_.path(), loggedProblem_);
+}
+
+void ReportStore::logSuccess(std::uint64_t dropped) {
+  const bool resumed = !std::exchange(loggedProblem_, {}).empty();
+  if (resumed || dropped > 0) {
+    errorLog(log_, "writing to %s goes on; rows dropped meanwhile: %llu", database_.path(), dropped);
+  }
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,83 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/store/SqliteDatabase.h"
+
+#include <sqlite3.h>
+#include <utility>
+
+namespace tonewerk {
+namespace {
+
+// A file name as the path of a URI.
+std::string uriPath(const std::string& path) {
+  std::string escaped;
+  for (const char c : path) {
+    if (c == '%' || c == '?' || c == '#') {
+      static constexpr char kDigits[] = "0123456789abcdef";
+      escaped +=
+          {'%', kDigits[static_cast<unsigned char>(c) >> 4], kDigits[static_cast<unsigned char>(c) & 15]};
+    } else {
+      escaped += c;
+    }
+  }
+  return escaped;
+}
+
+}  // namespace
+
+SqliteDatabase::~SqliteDatabase() { close(); }
+
+bool SqliteDatabase::open(const std::string& path, Mode mode, std::chrono::milliseconds patience) {
+  close();
+  int flags = SQLITE_OPEN_NOMUTEX | SQLITE_OPEN_EXRESCODE;
+  flags |= mode == Mode::kReadWrite ? SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE : SQLITE_OPEN_READONLY;
+  std::string name = path;
+  if (mode == Mode::kImmutable) {
+    flags |= SQLITE_OPEN_URI;
+    name = "file:" + uriPath(path) + "?immutable=1";
+  }
+  isOpen_ = sqlite3_open_v2(name.c_str(), &database_, flags, nullptr) == SQLITE_OK;
+  if (isOpen_) sqlite3_busy_timeout(database_, static_cast<int>(patience.count()));
+  return isOpen_;
+}
+
+void SqliteDatabase::close() {
+  sqlite3_close_v2(std::exchange(database_, nullptr));
+  isOpen_ = false;
+}
+
+bool SqliteDatabase::run(const std::string& sql) {
+  return sqlite3_exec(database_, sql.c_str(), nullptr, nullptr, nullptr) == SQLITE_OK;
+}
+
+SqliteStatement SqliteDatabase::prepare(const std::string& sql) {
+  sqlite3_stmt* statement = nullptr;
+  sqlite3_prepare_v3(database_, sql.c_str(), static_cast<int>(sql.size()) + 1, SQLITE_PREPARE_PERSISTENT,
+                     &statement, nullptr);
+  return SqliteStatement(statement);
+}
+
+std::optional<std::int64_t> SqliteDatabase::number(const std::string& sql) {
+  SqliteStatement statement = prepare(sql);
+  if (!statement || statement.step() != SqliteStatement::Step::kRow) return std::nullopt;
+  return statement.integer(0);
+}
+
+std::int64_t SqliteDatabase::changes() const { return sqlite3_changes64(database_); }
+
+bool SqliteDatabase::hasMoved() const {
+  int moved = 0;
+  return sqlite3_file_control(database_, "main", SQLITE_FCNTL_HAS_MOVED, &moved) == SQLITE_OK && moved != 0;
+}
+
+std::string SqliteDatabase::problem() const {
+  if (database_ == nullptr) return "not open";
+  return sqlite3_errmsg(database_);
+}
+
+bool SqliteDatabase::isCorrupt() const {
+  if (database_ == nullptr) return false;
+  const int code = sqlite3_extended_errcode(database_) & 0xff;
+  return code == SQLITE_CORRUPT || code == SQLITE_NOTADB;
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,147 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/store/StoreDatabase.h"
+
+#include <chrono>
+#include <cstdint>
+#include <filesystem>
+#include <system_error>
+#include <utility>
+
+#include "platform/linux/store/StoreSchema.h"
+
+namespace tonewerk {
+namespace {
+
+// For a lock that somebody else's writing holds; readers take none.
+constexpr std::chrono::milliseconds kPatience{500};
+
+}  // namespace
+
+StoreDatabase::StoreDatabase(std::string directory, const JsonService& json)
+    : directory_(std::move(directory)), path_(directory_ + "/" + std::string(kStoreFileName)), json_(json) {}
+
+StoreDatabase::Result StoreDatabase::write(std::span<const StoreRow> rows) {
+  if (database_.isOpen() && database_.hasMoved()) close();
+  const Result opened = open();
+  if (opened != Result::kDone || rows.empty()) return opened;
+  if (!database_.run("BEGIN IMMEDIATE")) return fail();
+  for (const StoreRow& row : rows) {
+    const bool inserted = std::visit([this](const auto& held) { return insert(held); }, row);
+    if (!inserted) return fail();
+  }
+  if (!database_.run("COMMIT")) return fail();
+  rtc_->committed();
+  return Result::kDone;
+}
+
+bool StoreDatabase::insert(const AnalyticsRow& row) { return analytics_->insert(row); }
+
+bool StoreDatabase::insert(const MetricRow& row) { return metrics_->insert(row); }
+
+bool StoreDatabase::insert(const PowerRow& row) { return power_->insert(row); }
+
+bool StoreDatabase::insert(const RtcSessionRow& row) { return rtc_->insert(row); }
+
+bool StoreDatabase::insert(const RtcMessageRow& row) { return rtc_->insert(row); }
+
+void StoreDatabase::setBounds(const StoreBounds& bounds) {
+  bounds_ = bounds;
+  if (database_.isOpen()) applyBounds();
+}
+
+StoreDatabase::Result StoreDatabase::trimAge(double now, bool& moreToDo) {
+  if (!database_.isOpen()) return Result::kDone;
+  return resultOf(trimmer_->trimAge(bounds_, now), moreToDo);
+}
+
+StoreDatabase::Result StoreDatabase::trimSize(bool& moreToDo) {
+  if (!database_.isOpen()) return Result::kDone;
+  return resultOf(trimmer_->trimSize(bounds_), moreToDo);
+}
+
+bool StoreDatabase::moveAside() {
+  close();
+  // The log must not meet the next database, whose pages it would overwrite.
+  for (const char* suffix : {"-wal", "-shm", ""}) {
+    const std::filesystem::path aside = path_ + ".corrupt" + suffix;
+    std::error_code error;
+    std::filesystem::remove(aside, error);
+    std::filesystem::rename(path_ + suffix, aside, error);
+    if (error && error != std::errc::no_such_file_or_directory) {
+      problem_ = error.message();
+      return false;
+    }
+  }
+  return true;
+}
+
+StoreDatabase::Result StoreDatabase::open() {
+  if (database_.isOpen()) return Result::kDone;
+  std::error_code error;
+  std::filesystem::create_directories(directory_, error);
+  if (error) return failWith(error.message());
+  if (!database_.open(path_, SqliteDatabase::Mode::kReadWrite, kPatience)) return fail();
+  const auto version = database_.number("PRAGMA user_version");
+  if (!version) return fail();
+  if (*version > kStoreSchemaVersion) {
+    return failWith("it was made by a newer version (schema " + std::to_string(*version) + ")");
+  }
+  if (*version == 0 && !prepareFile()) return fail();
+  // A commit then costs no sync; one comes with each checkpoint. What a power cut takes is the newest rows.
+  if (!database_.run("PRAGMA journal_mode = WAL; PRAGMA synchronous = NORMAL")) return fail();
+  applyBounds();
+  analytics_.emplace(database_, json_);
+  metrics_.emplace(database_);
+  power_.emplace(database_, json_);
+  rtc_.emplace(database_, json_, fileNumber_);
+  trimmer_.emplace(database_);
+  return Result::kDone;
+}
+
+bool StoreDatabase::prepareFile() {
+  ++fileNumber_;
+  // Before anything else is in the file: later these would take effect only with a rewrite of the whole.
+  // Pages of 8 KiB are cheaper to fill than smaller ones, and a commit of a single message still writes only
+  // one.
+  return database_.run(
+             "PRAGMA page_size = 8192; PRAGMA auto_vacuum = INCREMENTAL; PRAGMA journal_mode = WAL;") &&
+         database_.run(storeSchema());
+}
+
+void StoreDatabase::applyBounds() {
+  const std::int64_t pageBytes = database_.number("PRAGMA page_size").value_or(4096);
+  const std::int64_t bytes = bounds_.walBytes();
+  // A checkpoint at half of it leaves room for the batches that come in meanwhile.
+  database_.run("PRAGMA wal_autocheckpoint = " + std::to_string(bytes / 2 / pageBytes) +
+                "; PRAGMA journal_size_limit = " + std::to_string(bytes));
+}
+
+StoreDatabase::Result StoreDatabase::resultOf(StoreTrimmer::Outcome outcome, bool& moreToDo) {
+  if (outcome == StoreTrimmer::Outcome::kFailed) return fail();
+  moreToDo = moreToDo || outcome == StoreTrimmer::Outcome::kMoreToDo;
+  return Result::kDone;
+}
+
+StoreDatabase::Result StoreDatabase::fail() {
+  const Result result = database_.isCorrupt() ? Result::kCorrupt : Result::kFailed;
+  failWith(database_.problem());
+  return result;
+}
+
+StoreDatabase::Result StoreDatabase::failWith(std::string problem) {
+  problem_ = std::move(problem);
+  close();
+  return Result::kFailed;
+}
+
+void StoreDatabase::close() {
+  // Statements before their database. An open transaction is undone.
+  analytics_.reset();
+  metrics_.reset();
+  power_.reset();
+  rtc_.reset();
+  trimmer_.reset();
+  database_.close();
+}
+
+}  // namespace tonewerk

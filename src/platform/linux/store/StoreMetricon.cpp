@@ -1,0 +1,57 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/store/StoreMetricon.h"
+
+#include <utility>
+#include <vector>
+
+#include "platform/Clock.h"
+#include "platform/LogLine.h"
+#include "platform/PreferenceStore.h"
+#include "platform/linux/store/ReportStore.h"
+
+namespace tonewerk {
+
+StoreMetricon::StoreMetricon(ReportStore& store, const PreferenceStore& preferences, const Clock& clock,
+                             const LogCategory& log)
+    : store_(store), preferences_(preferences), clock_(clock), log_(log) {}
+
+StoreMetricon::~StoreMetricon() = default;
+
+void StoreMetricon::readConsumersAgain() {
+  const std::lock_guard lock(mutex_);
+  isStale_ = true;
+}
+
+bool StoreMetricon::isEventUsed(std::string_view name) {
+  const std::lock_guard lock(mutex_);
+  readConsumers();
+  const auto known = remembered_.find(name);
+  if (known != remembered_.end()) return known->second;
+  std::string text(name);
+  const bool used = consumers_->wants(text);
+  if (remembered_.size() >= kMaxRemembered) remembered_.clear();
+  remembered_.emplace(std::move(text), used);
+  return used;
+}
+
+void StoreMetricon::sendEvent(const SharedString& name, const UniqueFunction<ValueMap()>& payload) {
+  if (!isEventUsed(name)) return;
+  store_.recordEvent(clock_.now(), name, payload());
+}
+
+void StoreMetricon::readConsumers() {
+  const std::chrono::nanoseconds now = clock_.monotonic();
+  if (!std::exchange(isStale_, false) && now - readAt_ < kReadInterval) return;
+  readAt_ = now;
+  std::optional<Value> preference = preferences_.read(kPreferenceDomain, kConsumersKey);
+  if (consumers_ && preference == preference_) return;
+  std::vector<std::string> problems;
+  consumers_.emplace(preference, problems);
+  preference_ = std::move(preference);
+  remembered_.clear();
+  for (const std::string& problem : problems) {
+    errorLog(log_, "%s of %s: %s; it is left out", kConsumersKey, kPreferenceDomain, problem);
+  }
+}
+
+}  // namespace tonewerk

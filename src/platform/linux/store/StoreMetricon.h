@@ -1,0 +1,69 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <chrono>
+#include <mutex>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <unordered_map>
+
+#include "platform/Metricon.h"
+#include "platform/linux/store/AnalyticsConsumers.h"
+
+namespace tonewerk {
+
+class Clock;
+class LogCategory;
+class PreferenceStore;
+class ReportStore;
+
+// The analytics event service over the report store. An event that several consumers ask for is recorded
+// once.
+//
+// Who asks for what is read from the preferences, again at most once a second of the monotonic clock: a
+// change shows within a second. Entries that cannot be read are logged once, until they change, and left out.
+class StoreMetricon final : public Metricon {
+ public:
+  static constexpr std::string_view kPreferenceDomain = "com.orvane.metricon";
+  static constexpr std::string_view kConsumersKey = "consumers";
+
+  // Everything outlives it.
+  StoreMetricon(ReportStore& store, const PreferenceStore& preferences, const Clock& clock,
+                const LogCategory& log);
+  ~StoreMetricon() override;
+
+  // Any thread. The next event finds the preference as it is then.
+  void readConsumersAgain();
+
+  bool isEventUsed(std::string_view name) override;
+  // Records nothing when nobody asks for the name.
+  void sendEvent(const SharedString& name, const UniqueFunction<ValueMap()>& payload) override;
+
+ private:
+  static constexpr std::chrono::seconds kReadInterval{1};
+  // Names whose answer is remembered; the next one begins anew.
+  static constexpr std::size_t kMaxRemembered = 4096;
+
+  struct NameHash {
+    using is_transparent = void;
+    std::size_t operator()(std::string_view name) const { return SharedString::hashOf(name); }
+  };
+
+  void readConsumers();
+
+  ReportStore& store_;
+  const PreferenceStore& preferences_;
+  const Clock& clock_;
+  const LogCategory& log_;
+
+  std::mutex mutex_;
+  // Guarded by mutex_.
+  std::optional<AnalyticsConsumers> consumers_;
+  std::optional<Value> preference_;  // what consumers_ was made of
+  std::chrono::nanoseconds readAt_{0};
+  bool isStale_ = true;
+  std::unordered_map<std::string, bool, NameHash, std::equal_to<>> remembered_;
+};
+
+}  // namespace tonewerk

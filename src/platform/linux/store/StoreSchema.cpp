@@ -1,0 +1,48 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/store/StoreSchema.h"
+
+namespace tonewerk {
+namespace {
+
+// Lean on purpose: a commit of a single message then writes a single page. An index on time would cost a
+// second one, AUTOINCREMENT a third; instead, the newest row of a table is never deleted, so that identifiers
+// only grow.
+constexpr std::string_view kTables = R"(
+  CREATE TABLE analytics_row (
+    id INTEGER PRIMARY KEY, recorded_at REAL NOT NULL, name_set INTEGER NOT NULL, payload TEXT NOT NULL);
+  CREATE TABLE analytics_name (
+    name_set INTEGER NOT NULL, position INTEGER NOT NULL, name TEXT NOT NULL,
+    PRIMARY KEY (name_set, position)) WITHOUT ROWID;
+  CREATE INDEX analytics_name_by_name ON analytics_name (name);
+  CREATE TABLE metric (
+    id INTEGER PRIMARY KEY, posted_at REAL NOT NULL, identifier INTEGER NOT NULL, record BLOB NOT NULL);
+  CREATE TABLE power_event (
+    id INTEGER PRIMARY KEY, recorded_at REAL NOT NULL, event_group INTEGER NOT NULL, name TEXT NOT NULL,
+    payload TEXT NOT NULL);
+  CREATE TABLE rtc_session (
+    id INTEGER PRIMARY KEY, started_at REAL NOT NULL, session_info TEXT NOT NULL,
+    user_info TEXT NOT NULL);
+  CREATE TABLE rtc_message (
+    id INTEGER PRIMARY KEY, sent_at REAL NOT NULL, rtc_session INTEGER NOT NULL,
+    category INTEGER NOT NULL, type INTEGER NOT NULL, payload TEXT NOT NULL);
+)";
+
+// CROSS JOIN keeps the rows outermost, so that events come in the order of their identifiers without being
+// sorted.
+constexpr std::string_view kAnalyticsView = R"(
+  CREATE VIEW analytics_event (id, recorded_at, name, payload) AS
+    SELECT r.id * 2 + n.position, r.recorded_at, n.name, r.payload
+      FROM analytics_row AS r CROSS JOIN analytics_name AS n ON n.name_set = r.name_set;
+)";
+static_assert(kStoreNamesPerRow == 2, "the view says 2");
+
+}  // namespace
+
+std::string storeSchema() {
+  std::string sql = "BEGIN IMMEDIATE;";
+  sql += kTables;
+  sql += kAnalyticsView;
+  return sql + "PRAGMA user_version = " + std::to_string(kStoreSchemaVersion) + "; COMMIT;";
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,219 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/store/StoreTrimmer.h"
+
+#include <algorithm>
+#include <array>
+#include <cstddef>
+#include <string>
+#include <vector>
+
+#include "platform/linux/store/StoreSchema.h"
+
+namespace tonewerk {
+namespace {
+
+constexpr std::int64_t kMinWalBytes = 256 << 10;
+constexpr std::int64_t kMaxWalBytes = 8 << 20;
+
+// Rows of each table that one statement deletes for their age, rows of all tables that one round deletes for
+// their size, and how many such rounds make a slice.
+constexpr std::int64_t kChunkRows = 500;
+constexpr int kRowsPerRound = 2000;
+constexpr std::int64_t kBytesPerRound = 2 << 20;
+constexpr int kRoundsPerSlice = 16;
+// Pages that a slice gives back.
+constexpr std::int64_t kVacuumPages = 512;
+// Fewer free pages than this are left for new rows in any case.
+constexpr std::int64_t kSpareFreePages = 64;
+
+// Oldest by identifier, which the clock cannot turn round. The newest row stays, so that its identifier is
+// not given out again: a reader that goes on behind the last one it saw misses nothing.
+std::string oldestRows(const StoreTable& table, const std::string& columns) {
+  const std::string name(table.name);
+  return "SELECT " + columns + " FROM " + name + " WHERE id < (SELECT max(id) FROM " + name + ") ORDER BY id";
+}
+
+std::string oldestChunk(const StoreTable& table) {
+  return oldestRows(table, "id") + " LIMIT " + std::to_string(kChunkRows);
+}
+
+// Goes through one table from its oldest row on.
+class OldestRows {
+ public:
+  OldestRows(SqliteDatabase& database, const StoreTable& table)
+      : select_(database.prepare(
+            oldestRows(table, "id, " + std::string(table.time) + ", " + std::string(table.bytes)))) {
+    step();
+  }
+
+  bool hasFailed() const { return at_ == SqliteStatement::Step::kFailed; }
+  bool hasRow() const { return at_ == SqliteStatement::Step::kRow; }
+  double time() const { return select_.number(1); }
+
+  // Goes on behind the current row, which is then among those to be deleted. The bytes that it holds.
+  std::int64_t pass() {
+    passed_ = select_.integer(0);
+    const std::int64_t bytes = select_.integer(2) + kLeastRowBytes;
+    step();
+    return bytes;
+  }
+  // The identifier up to which rows were passed; none is 0.
+  std::int64_t passed() const { return passed_; }
+
+ private:
+  // Identifier, time, lengths of the columns.
+  static constexpr std::int64_t kLeastRowBytes = 16;
+
+  void step() { at_ = select_.step(); }
+
+  SqliteStatement select_;
+  SqliteStatement::Step at_ = SqliteStatement::Step::kDone;
+  std::int64_t passed_ = 0;
+};
+
+// The one whose next row is the oldest of all; null where no row is left.
+OldestRows* oldestOf(std::vector<OldestRows>& tables) {
+  OldestRows* oldest = nullptr;
+  for (OldestRows& table : tables) {
+    if (table.hasRow() && (oldest == nullptr || table.time() < oldest->time())) oldest = &table;
+  }
+  return oldest;
+}
+
+}  // namespace
+
+std::int64_t StoreBounds::walBytes() const { return std::clamp(bytes / 8, kMinWalBytes, kMaxWalBytes); }
+
+StoreTrimmer::Outcome StoreTrimmer::trimAge(const StoreBounds& bounds, double now) {
+  for (int round = 0; round < kRoundsPerSlice; ++round) {
+    const std::int64_t deleted = deleteUpTo(now - bounds.seconds);
+    if (deleted < 0) return Outcome::kFailed;
+    if (deleted == 0) return Outcome::kDone;
+  }
+  return Outcome::kMoreToDo;
+}
+
+StoreTrimmer::Outcome StoreTrimmer::trimSize(const StoreBounds& bounds) {
+  const Outcome outcome = deleteForSize(bounds.fileBytes());
+  return outcome == Outcome::kDone ? vacuum(bounds.fileBytes()) : outcome;
+}
+
+StoreTrimmer::Outcome StoreTrimmer::deleteForSize(std::int64_t fileBytes) {
+  // What is deleted in one go makes room for a while: a 32nd of the file.
+  const std::int64_t high = fileBytes - fileBytes / 32;
+  const std::int64_t low = high - fileBytes / 32;
+  for (int round = 0; round < kRoundsPerSlice; ++round) {
+    if (!measure()) return Outcome::kFailed;
+    const std::int64_t used = (pages_ - freePages_) * pageBytes_;
+    shrinking_ = used > (shrinking_ ? low : high);
+    if (!shrinking_) return Outcome::kDone;
+    const std::optional<bool> hasEmptied = emptyNewest(low);
+    if (!hasEmptied) return Outcome::kFailed;
+    if (*hasEmptied) continue;
+    // A row takes less than twice its bytes in pages, so half of what is over is never too much.
+    const std::int64_t deleted = deleteOldest(std::clamp((used - low) / 2, pageBytes_, kBytesPerRound));
+    if (deleted < 0) return Outcome::kFailed;
+    if (deleted == 0) return Outcome::kDone;  // nothing left to delete
+  }
+  return Outcome::kMoreToDo;
+}
+
+StoreTrimmer::Outcome StoreTrimmer::vacuum(std::int64_t fileBytes) {
+  if (!measure()) return Outcome::kFailed;
+  // Moving pages costs writes, so free ones stay for new rows unless the file is too large or mostly empty.
+  const std::int64_t spare = std::max(pages_ / 4, kSpareFreePages);
+  const std::int64_t over = pages_ - fileBytes / pageBytes_;
+  const std::int64_t wanted = std::min(freePages_, std::max(freePages_ - spare, over));
+  if (wanted <= 0) return Outcome::kDone;
+  const std::int64_t pages = std::min(wanted, kVacuumPages);
+  if (!database_.run("PRAGMA incremental_vacuum(" + std::to_string(pages) + ")")) return Outcome::kFailed;
+  if (pages < wanted) return Outcome::kMoreToDo;
+  // The file itself only gets shorter with a checkpoint. One that a reader holds up is made later, by SQLite.
+  database_.run("PRAGMA wal_checkpoint(PASSIVE)");
+  return Outcome::kDone;
+}
+
+bool StoreTrimmer::measure() {
+  const auto size = database_.number("PRAGMA page_size");
+  const auto pages = database_.number("PRAGMA page_count");
+  const auto freePages = database_.number("PRAGMA freelist_count");
+  if (!size || !pages || !freePages) return false;
+  pageBytes_ = *size;
+  pages_ = *pages;
+  freePages_ = *freePages;
+  return true;
+}
+
+// Deletes what is not younger than `time` of the oldest chunk of every table. The number of rows, negative on
+// failure.
+std::int64_t StoreTrimmer::deleteUpTo(double time) {
+  std::int64_t deleted = 0;
+  for (const StoreTable& table : kStoreTables) {
+    SqliteStatement statement =
+        database_.prepare("DELETE FROM " + std::string(table.name) + " WHERE " + std::string(table.time) +
+                          " <= ?1 AND id IN (" + oldestChunk(table) + ")");
+    statement.bind(1, time);
+    if (!statement.run()) return -1;
+    deleted += database_.changes();
+  }
+  return deleted;
+}
+
+// The newest rows, which are never deleted, may be too large for the bound. The largest of them is then
+// emptied, or all others would be deleted in vain. Whether one was; none on failure.
+std::optional<bool> StoreTrimmer::emptyNewest(std::int64_t mostBytes) {
+  std::int64_t sum = 0;
+  std::int64_t most = 0;
+  std::string emptyLargest;
+  for (const StoreTable& table : kStoreTables) {
+    const std::string name(table.name);
+    const std::string newest = " WHERE id = (SELECT max(id) FROM " + name + ")";
+    std::string question = "SELECT ";
+    question.append(table.bytes).append(" FROM ").append(name).append(newest);
+    SqliteStatement select = database_.prepare(question);
+    const SqliteStatement::Step step = select.step();
+    if (step == SqliteStatement::Step::kFailed) return std::nullopt;
+    if (step == SqliteStatement::Step::kDone) continue;
+    const std::int64_t held = select.integer(0);
+    sum += held;
+    if (held <= most) continue;
+    most = held;
+    emptyLargest = "UPDATE ";
+    emptyLargest.append(name).append(" SET ").append(table.empty).append(newest);
+  }
+  if (sum <= mostBytes) return false;
+  return database_.run(emptyLargest) ? std::optional(true) : std::nullopt;
+}
+
+// Deletes the oldest rows of all tables until they come to `bytes`, or a round is full. The number of rows,
+// negative on failure.
+std::int64_t StoreTrimmer::deleteOldest(std::int64_t bytes) {
+  std::vector<OldestRows> tables;
+  tables.reserve(kStoreTables.size());
+  for (const StoreTable& table : kStoreTables) tables.emplace_back(database_, table);
+  std::array<std::int64_t, kStoreTables.size()> ends{};
+  for (int row = 0; row < kRowsPerRound && bytes > 0; ++row) {
+    OldestRows* oldest = oldestOf(tables);
+    if (oldest == nullptr) break;
+    bytes -= oldest->pass();
+  }
+  if (std::any_of(tables.begin(), tables.end(), [](const OldestRows& table) { return table.hasFailed(); })) {
+    return -1;
+  }
+  std::transform(tables.begin(), tables.end(), ends.begin(),
+                 [](const OldestRows& table) { return table.passed(); });
+  tables.clear();  // nothing may be read from a table whose rows go
+
+  std::int64_t deleted = 0;
+  for (std::size_t at = 0; at < ends.size(); ++at) {
+    if (ends[at] == 0) continue;
+    SqliteStatement statement =
+        database_.prepare("DELETE FROM " + std::string(kStoreTables[at].name) + " WHERE id <= ?1");
+    statement.bind(1, ends[at]);
+    if (!statement.run()) return -1;
+    deleted += database_.changes();
+  }
+  return deleted;
+}
+
+}  // namespace tonewerk

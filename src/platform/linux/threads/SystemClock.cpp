@@ -1,0 +1,43 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/threads/SystemClock.h"
+
+#include <cmath>
+#include <ctime>
+#include <thread>
+
+namespace tonewerk {
+namespace {
+
+timespec timeOf(clockid_t clock) {
+  timespec time{};
+  clock_gettime(clock, &time);
+  return time;
+}
+
+}  // namespace
+
+double SystemClock::now() const {
+  const timespec time = timeOf(CLOCK_REALTIME);
+  return static_cast<double>(time.tv_sec) + static_cast<double>(time.tv_nsec) * 1e-9;
+}
+
+std::chrono::nanoseconds SystemClock::monotonic() const {
+  const timespec time = timeOf(CLOCK_MONOTONIC);
+  return std::chrono::seconds(time.tv_sec) + std::chrono::nanoseconds(time.tv_nsec);
+}
+
+std::chrono::minutes SystemClock::utcOffset(double at) const {
+  constexpr double kFarthest = 1e15;  // some thirty million years
+  if (!(std::fabs(at) < kFarthest)) return std::chrono::minutes(0);
+  const auto seconds = static_cast<std::time_t>(std::floor(at));
+  std::tm local{};
+  tzset();  // localtime_r() need not look for a changed time zone
+  if (localtime_r(&seconds, &local) == nullptr) return std::chrono::minutes(0);
+  return std::chrono::duration_cast<std::chrono::minutes>(std::chrono::seconds(local.tm_gmtoff));
+}
+
+void SystemClock::sleep(std::chrono::nanoseconds duration) {
+  if (duration.count() > 0) std::this_thread::sleep_for(duration);
+}
+
+}  // namespace tonewerk

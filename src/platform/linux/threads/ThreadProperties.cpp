@@ -1,0 +1,22 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/threads/ThreadProperties.h"
+
+#include <pthread.h>
+#include <string>
+#include <sys/resource.h>
+#include <unistd.h>
+
+namespace tonewerk {
+
+void nameThisThread(std::string_view name) {
+  constexpr std::size_t kMost = 15;
+  if (name.size() > kMost) name.remove_prefix(name.size() - kMost);
+  pthread_setname_np(pthread_self(), std::string(name).c_str());
+}
+
+void setNicenessOfThisThread(int niceness) {
+  // Linux keeps niceness by thread. Without the permission it stays at the process's.
+  setpriority(PRIO_PROCESS, static_cast<id_t>(gettid()), niceness);
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,85 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/threads/ThreadQueue.h"
+
+#include <cassert>
+#include <future>
+#include <utility>
+
+#include "platform/linux/threads/ThreadProperties.h"
+#include "platform/linux/threads/WorkBatch.h"
+
+namespace tonewerk {
+namespace {
+
+// A burst's memory is given back when the burst is over.
+constexpr std::size_t kMostKeptCapacity = 4096;
+
+// Niceness: ahead of ordinary threads where that is allowed, behind them for what nobody waits for.
+constexpr int kUserInteractiveNiceness = -10;
+constexpr int kUtilityNiceness = 5;
+
+}  // namespace
+
+ThreadQueue::ThreadQueue(std::string name, QueuePriority priority)
+    : name_(std::move(name)), priority_(priority), thread_([this] { run(); }) {}
+
+ThreadQueue::~ThreadQueue() {
+  assert(!isCurrent());
+  {
+    const std::lock_guard lock(mutex_);
+    isEnding_ = true;
+  }
+  workArrived_.notify_one();
+  thread_.join();
+}
+
+void ThreadQueue::async(Task work) {
+  bool mustWake = false;
+  {
+    const std::lock_guard lock(mutex_);
+    pending_.push_back(std::move(work));
+    mustWake = std::exchange(isWaiting_, false);
+  }
+  if (mustWake) workArrived_.notify_one();
+}
+
+void ThreadQueue::drain() {
+  assert(!isCurrent());
+  std::promise<void> promise;
+  const std::future<void> reached = promise.get_future();
+  async([held = std::move(promise)]() mutable { held.set_value(); });
+  reached.wait();
+}
+
+void ThreadQueue::run() {
+  nameThisThread(name_);
+  setNicenessOfThisThread(priority_ == QueuePriority::kUserInteractive ? kUserInteractiveNiceness
+                                                                       : kUtilityNiceness);
+  std::vector<Task> batch;
+  while (waitForWork(batch)) {
+    WorkBatch together;
+    for (Task& held : batch) {
+      {
+        const Task work = std::move(held);  // destroyed before the next piece runs
+        work();
+      }
+      together.pieceHasRun();
+    }
+    batch.clear();
+    if (batch.capacity() > kMostKeptCapacity) std::vector<Task>().swap(batch);
+  }
+}
+
+bool ThreadQueue::waitForWork(std::vector<Task>& batch) {
+  std::unique_lock lock(mutex_);
+  while (pending_.empty()) {
+    if (isEnding_) return false;
+    isWaiting_ = true;
+    workArrived_.wait(lock);
+  }
+  isWaiting_ = false;
+  batch.swap(pending_);
+  return true;
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,113 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/threads/TimerThread.h"
+
+#include <algorithm>
+#include <cassert>
+#include <condition_variable>
+#include <mutex>
+#include <vector>
+
+#include "platform/linux/threads/ThreadProperties.h"
+
+namespace tonewerk {
+namespace {
+
+using MonotonicTime = std::chrono::steady_clock::time_point;
+
+struct Entry {
+  std::chrono::milliseconds interval;
+  MonotonicTime due;
+  std::function<void()> tick;
+};
+
+}  // namespace
+
+struct TimerThread::Schedule {
+  std::mutex mutex;  // guards all below
+  std::vector<std::shared_ptr<Entry>> entries;
+  bool isEnding = false;
+  std::condition_variable changed;
+
+  void add(std::shared_ptr<Entry> entry) {
+    {
+      const std::lock_guard lock(mutex);
+      entries.push_back(std::move(entry));
+    }
+    changed.notify_one();
+  }
+
+  // The thread is not woken: it finds out when it would have run the tick.
+  void remove(const std::shared_ptr<Entry>& entry) {
+    const std::lock_guard lock(mutex);
+    std::erase(entries, entry);
+  }
+
+  void end() {
+    {
+      const std::lock_guard lock(mutex);
+      isEnding = true;
+    }
+    changed.notify_one();
+  }
+
+  // Waits for the next tick that is due, and sets when the one after it will be. Null when the service ends.
+  std::shared_ptr<Entry> waitForDue() {
+    std::unique_lock lock(mutex);
+    for (;;) {
+      if (isEnding) return nullptr;
+      const auto next = std::min_element(entries.begin(), entries.end(),
+                                         [](const auto& a, const auto& b) { return a->due < b->due; });
+      if (next == entries.end()) {
+        changed.wait(lock);
+        continue;
+      }
+      std::shared_ptr<Entry> entry = *next;
+      const MonotonicTime now = std::chrono::steady_clock::now();
+      if (entry->due > now) {
+        const MonotonicTime until = entry->due;
+        entry.reset();  // the timer's owner may destroy the tick meanwhile
+        changed.wait_until(lock, until);
+        continue;
+      }
+      // Missed ticks are not made up for: the next one is the first that still lies ahead.
+      entry->due += entry->interval * ((now - entry->due) / entry->interval + 1);
+      return entry;
+    }
+  }
+
+  void run() {
+    nameThisThread("timers");
+    while (const std::shared_ptr<Entry> entry = waitForDue()) entry->tick();
+  }
+};
+
+class TimerThread::ScheduledTimer final : public Timer {
+ public:
+  ScheduledTimer(std::shared_ptr<Schedule> schedule, std::shared_ptr<Entry> entry)
+      : schedule_(std::move(schedule)), entry_(std::move(entry)) {}
+  ScheduledTimer(const ScheduledTimer&) = delete;
+  ScheduledTimer& operator=(const ScheduledTimer&) = delete;
+  ~ScheduledTimer() override { schedule_->remove(entry_); }
+
+ private:
+  std::shared_ptr<Schedule> schedule_;
+  std::shared_ptr<Entry> entry_;
+};
+
+TimerThread::TimerThread()
+    : schedule_(std::make_shared<Schedule>()), thread_([schedule = schedule_] { schedule->run(); }) {}
+
+TimerThread::~TimerThread() {
+  schedule_->end();
+  thread_.join();
+}
+
+std::unique_ptr<Timer> TimerThread::repeat(std::chrono::milliseconds interval, std::function<void()> tick) {
+  assert(interval.count() > 0);
+  auto entry =
+      std::make_shared<Entry>(Entry{interval, std::chrono::steady_clock::now() + interval, std::move(tick)});
+  schedule_->add(entry);
+  return std::make_unique<ScheduledTimer>(schedule_, std::move(entry));
+}
+
+}  // namespace tonewerk

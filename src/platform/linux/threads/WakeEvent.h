@@ -1,0 +1,39 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cerrno>
+#include <cstdint>
+#include <sys/eventfd.h>
+#include <unistd.h>
+
+#include "platform/linux/files/FileDescriptor.h"
+
+namespace tonewerk {
+
+// Wakes a thread that polls. Once is enough until it has woken. Any thread, but for open() and close().
+class WakeEvent {
+ public:
+  // False without descriptors.
+  bool open() {
+    event_.reset(::eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK));
+    return static_cast<bool>(event_);
+  }
+  void close() { event_.reset(); }
+
+  int fileDescriptor() const { return event_.get(); }
+  void signal() const {
+    const std::uint64_t one = 1;
+    while (::write(event_.get(), &one, sizeof(one)) < 0 && errno == EINTR) {
+    }
+  }
+  void clear() const {
+    std::uint64_t count = 0;
+    while (::read(event_.get(), &count, sizeof(count)) < 0 && errno == EINTR) {
+    }
+  }
+
+ private:
+  FileDescriptor event_;
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,121 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// What the capture worker's instances leave on the disk when it is the real service that they ask.
+#include <filesystem>
+#include <functional>
+#include <gmock/gmock.h>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "platform/LogCategory.h"
+#include "platform/linux/diagnostics/DiagnosticsDirectory.h"
+#include "platform/linux/diagnostics/DiagnosticsStore.h"
+#include "platform/linux/diagnostics/LinuxCapsa.h"
+#include "platform/linux/json/NlohmannJsonService.h"
+#include "platform/linux/threads/ThreadQueueFactory.h"
+#include "support/TemporaryDirectory.h"
+#include "workers/diagnostics/CapsaTest.h"
+#include "workers/diagnostics/TWReportingCapsaWorkerInstanceAlarmLowRMS.h"
+#include "workers/diagnostics/TWReportingCapsaWorkerInstanceHapticLeaks.h"
+
+namespace tonewerk {
+namespace {
+
+using ::testing::Contains;
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+
+constexpr std::chrono::seconds kGenerous{30};
+
+class CaptureInstancesTest : public CapsaTest {
+ protected:
+  // On the work queue, as everything that instances do.
+  void onWorkQueue(std::function<void()> work) {
+    context->reportingServerQueue().async(std::move(work));
+    test.queues.runAll();
+  }
+  // What the worker does when an instance's symptom was seen often and long enough.
+  void fire(TWReportingSessionCapsaWorkerInstance& instance, AudioEventCategory category,
+            AudioEventType type) {
+    onWorkQueue([&] {
+      instance.workerState().symptomReporter = capsa.makeReporter();
+      instance.fire(TWReportingSessionMessage({{"n", 1}}, category, type));
+    });
+  }
+  // The captures that are on the disk in the end.
+  std::vector<std::string> captures() {
+    capsa.finish();
+    store.finish(kGenerous);
+    std::vector<std::string> names;
+    for (const auto& entry : items.list(DiagnosticKind::kCapture)) names.push_back(entry.name);
+    return names;
+  }
+  ValueMap request(const std::string& name) {
+    std::string problem;
+    const std::string text =
+        items.readFile(DiagnosticKind::kCapture, name, "request.json").value_or("no file");
+    const std::optional<Value> value = json.parse(text, problem);
+    EXPECT_TRUE(value && value->asMap() != nullptr) << problem;
+    return value && value->asMap() != nullptr ? *value->asMap() : ValueMap();
+  }
+
+  TemporaryDirectory directory;
+  const DiagnosticsDirectory items{directory.path()};
+  std::shared_ptr<TWReportingSession> session = makeSessionOf(kServiceAlarms);
+  const LogCategory adapters{test.log, "com.orvane.tonewerk", "twrs"};
+  NlohmannJsonService json;
+  ThreadQueueFactory queues;
+  DiagnosticsStore store{directory.path(), {}, json, test.preferences, test.clock, adapters, {}};
+  LinuxCapsa capsa{store, test.preferences, queues, test.timers, test.clock, adapters};
+};
+
+TEST_F(CaptureInstancesTest, AHapticLeakIsCapturedUnderTheIdentifierThatItsStateKeeps) {
+  TWReportingCapsaWorkerInstanceHapticLeaks instance(session);
+  fire(instance, kCategoryGeneric, kTypeEnergybook);
+  const std::string identifier = instance.workerState().currentCapsaSessionIdentifier.value_or("none");
+  EXPECT_THAT(infos(), Contains("Started Capsa session. sessionId=" + identifier));
+  EXPECT_THAT(captures(), ElementsAre(identifier));
+  const ValueMap found = request(identifier);
+  EXPECT_EQ(textOf(found.find("signature")),
+            R"({"domain":"AudioAnalytics","type":"alarms","subType":"Generic",)"
+            R"("subtypeContext":"Energybook","detectedProcess":"player"})");
+  EXPECT_EQ(found.number("duration"), 0.0);
+  EXPECT_EQ(textOf(found.find("payload")),
+            R"({"kFaultsignKeyPayloadDEParameters":)"
+            R"({"com.orvane.EnergybookCore.DESysLogFilterProcess":{"processIDs":[4711,12]}}})");
+}
+
+TEST_F(CaptureInstancesTest, AQuietAlarmWhoseSessionOutlivesTheMinuteIsCaptured) {
+  TWReportingCapsaWorkerInstanceAlarmLowRMS instance(session);
+  fire(instance, kCategoryError, kTypeIssueDetector);
+  const std::string identifier = instance.workerState().currentCapsaSessionIdentifier.value_or("none");
+  test.clock.advance(60.0);
+  onWorkQueue([&] { instance.stop(); });  // too late
+  EXPECT_THAT(captures(), ElementsAre(identifier));
+  EXPECT_EQ(request(identifier).number("duration"), 60.0);
+}
+
+TEST_F(CaptureInstancesTest, AQuietAlarmWhoseSessionEndsWithinTheMinuteIsNot) {
+  TWReportingCapsaWorkerInstanceAlarmLowRMS instance(session);
+  fire(instance, kCategoryError, kTypeIssueDetector);
+  test.clock.advance(59.0);
+  onWorkQueue([&] { instance.stop(); });
+  test.clock.advance(600.0);
+  EXPECT_THAT(captures(), IsEmpty());
+}
+
+TEST_F(CaptureInstancesTest, ACaptureThatTheServiceRefusesLeavesNoneReturnedAndNothingToCancel) {
+  TWReportingCapsaWorkerInstanceAlarmLowRMS first(session);
+  TWReportingCapsaWorkerInstanceAlarmLowRMS second(session);
+  fire(first, kCategoryError, kTypeIssueDetector);
+  fire(second, kCategoryError, kTypeIssueDetector);
+  EXPECT_EQ(second.workerState().currentCapsaSessionIdentifier, "NONE_RETURNED");
+  EXPECT_THAT(infos(), Contains("Failed starting capsa session. reason=kFaultsignErrorRequestThrottled"));
+  onWorkQueue([&] { second.stop(); });  // the first one's goes on
+  test.clock.advance(60.0);
+  EXPECT_THAT(captures(), ElementsAre(first.workerState().currentCapsaSessionIdentifier.value_or("none")));
+}
+
+}  // namespace
+}  // namespace tonewerk

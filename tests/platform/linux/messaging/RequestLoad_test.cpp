@@ -1,0 +1,98 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/messaging/RequestLoad.h"
+
+#include <gmock/gmock.h>
+#include <memory>
+#include <thread>
+#include <vector>
+
+#include "platform/linux/messagepack/RpcLimits.h"
+
+namespace tonewerk {
+namespace {
+
+using testing::ElementsAre;
+using testing::IsEmpty;
+
+constexpr std::uint64_t kConnection = 9;
+
+class RequestLoadTest : public testing::Test {
+ protected:
+  std::vector<RequestToken> start(std::size_t count, std::size_t bytes) {
+    std::vector<RequestToken> tokens;
+    for (std::size_t at = 0; at < count; ++at) tokens.push_back(load->start(bytes));
+    return tokens;
+  }
+
+  std::shared_ptr<IoWaker> waker = std::make_shared<IoWaker>();
+  std::shared_ptr<RequestLoad> load = std::make_shared<RequestLoad>(waker, kConnection);
+};
+
+TEST_F(RequestLoadTest, HasRoomUntilTheBoundOfRequestsIsReached) {
+  auto tokens = start(kMostUnfinishedRequests - 1, 1);
+  EXPECT_TRUE(load->hasRoom(0));
+  tokens.push_back(load->start(1));
+  EXPECT_FALSE(load->hasRoom(0));
+}
+
+TEST_F(RequestLoadTest, HasRoomUntilTheBoundOfBytesIsReached) {
+  auto tokens = start(1, kMostUnfinishedBytes - 1);
+  EXPECT_TRUE(load->hasRoom(0));
+  tokens.push_back(load->start(1));
+  EXPECT_FALSE(load->hasRoom(0));
+}
+
+TEST_F(RequestLoadTest, CountsTheBytesOfUnreadRepliesToo) {
+  const auto tokens = start(1, 1000);
+  EXPECT_TRUE(load->hasRoom(kMostUnfinishedBytes - 1001));
+  EXPECT_FALSE(load->hasRoom(kMostUnfinishedBytes - 1000));
+}
+
+TEST_F(RequestLoadTest, HasNoRoomForRepliesAloneEither) {
+  EXPECT_TRUE(load->hasRoom(kMostUnfinishedBytes - 1));
+  EXPECT_FALSE(load->hasRoom(kMostUnfinishedBytes));
+}
+
+TEST_F(RequestLoadTest, SeesWhatHasFinishedWithoutBeingWoken) {
+  auto tokens = start(kMostUnfinishedRequests, 1);
+  tokens.clear();
+  EXPECT_TRUE(load->hasRoom(0));
+  EXPECT_THAT(waker->take(), IsEmpty());
+}
+
+TEST_F(RequestLoadTest, WakesTheConnectionOnceWhenHalfHasFinished) {
+  auto tokens = start(kMostUnfinishedRequests, 1);
+  ASSERT_FALSE(load->hasRoom(0));
+  tokens.resize(kMostUnfinishedRequests / 2 + 1);
+  EXPECT_THAT(waker->take(), IsEmpty());
+  tokens.pop_back();
+  EXPECT_THAT(waker->take(), ElementsAre(kConnection));
+  EXPECT_TRUE(load->hasRoom(0));
+  tokens.clear();
+  EXPECT_THAT(waker->take(), IsEmpty());
+}
+
+TEST_F(RequestLoadTest, WakesTheConnectionForASingleLargeRequest) {
+  auto tokens = start(1, kMostUnfinishedBytes);
+  ASSERT_FALSE(load->hasRoom(0));
+  tokens.clear();
+  EXPECT_THAT(waker->take(), ElementsAre(kConnection));
+  EXPECT_TRUE(load->hasRoom(0));
+}
+
+// A finish that fell between the look at the counters and the wish to be woken once must not be lost, or the
+// connection would never be read from again.
+TEST_F(RequestLoadTest, NeverMissesTheLastFinishOnAnotherThread) {
+  for (int round = 0; round < 300; ++round) {
+    auto tokens = start(kMostUnfinishedRequests, 1);
+    std::thread finisher([tokens = std::move(tokens)]() mutable { tokens.clear(); });
+    const bool hadRoom = load->hasRoom(0);
+    finisher.join();
+    ASSERT_TRUE(hadRoom || !waker->take().empty());
+    ASSERT_TRUE(load->hasRoom(0));
+    waker->take();
+  }
+}
+
+}  // namespace
+}  // namespace tonewerk

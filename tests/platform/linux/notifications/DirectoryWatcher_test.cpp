@@ -1,0 +1,440 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/notifications/DirectoryWatcher.h"
+
+#include <algorithm>
+#include <chrono>
+#include <condition_variable>
+#include <filesystem>
+#include <fstream>
+#include <functional>
+#include <gmock/gmock.h>
+#include <memory>
+#include <mutex>
+#include <string>
+#include <unistd.h>
+#include <vector>
+
+#include "support/MemoryLog.h"
+#include "support/Stranger.h"
+#include "support/TemporaryDirectory.h"
+
+namespace tonewerk {
+namespace {
+
+namespace fs = std::filesystem;
+using ::testing::ElementsAre;
+using ::testing::IsEmpty;
+
+constexpr std::chrono::seconds kPatience{20};
+constexpr char kEverything[] = "*";
+
+class DirectoryWatcherTest : public ::testing::Test {
+ protected:
+  void watch() {
+    watcher = std::make_unique<DirectoryWatcher>(
+        watched, [this](std::string_view name) { tell(std::string(name)); }, [this] { tell(kEverything); },
+        category);
+  }
+  std::string path(const std::string& name) const { return watched + "/" + name; }
+  static void write(const std::string& path, const std::string& text = "1\n") { std::ofstream(path) << text; }
+
+  void tell(const std::string& what) {
+    {
+      std::unique_lock lock(mutex);
+      told.push_back(what);
+      all.push_back(what);
+      isHeld.wait(lock, [this] { return !mustHold; });
+    }
+    changed.notify_all();
+  }
+  // Waits until it was told of this, and forgets what was told up to there.
+  bool waitFor(const std::string& what, std::chrono::milliseconds patience = kPatience) {
+    std::unique_lock lock(mutex);
+    return changed.wait_for(lock, patience, [&] {
+      const auto found = std::find(told.begin(), told.end(), what);
+      if (found == told.end()) return false;
+      before.assign(told.begin(), found);
+      told.erase(told.begin(), found + 1);
+      return true;
+    });
+  }
+  // A file that is there but once.
+  std::string newWitness() { return "witness" + std::to_string(++witnesses); }
+  // What was told before a witness that is written now.
+  std::vector<std::string> toldSoFar() {
+    const std::string witness = newWitness();
+    write(path(witness));
+    EXPECT_TRUE(waitFor(witness));
+    return before;
+  }
+  // Keeps the watcher in its handler: what happens until release() gathers in the kernel.
+  void hold() {
+    {
+      const std::lock_guard lock(mutex);
+      mustHold = true;
+    }
+    write(path("gate"));
+  }
+  void release() {
+    {
+      const std::lock_guard lock(mutex);
+      mustHold = false;
+    }
+    isHeld.notify_all();
+    EXPECT_TRUE(waitFor("gate"));
+  }
+  bool wasEverTold(const std::string& what) {
+    const std::lock_guard lock(mutex);
+    return std::find(all.begin(), all.end(), what) != all.end();
+  }
+  // Whether files are told of again. The first may fall into the time when everything is.
+  bool isFollowed() {
+    for (int attempt = 0; attempt < 400; ++attempt) {
+      const std::string witness = newWitness();
+      write(path(witness));
+      if (waitFor(witness, std::chrono::milliseconds(50))) return true;
+    }
+    return false;
+  }
+
+  TemporaryDirectory root;
+  const std::string parent = root.path("parent");
+  std::string watched = parent + "/watched";
+  MemoryLog log;
+  LogCategory category{log, "com.orvane.tonewerk", "twrs"};
+  std::mutex mutex;
+  std::condition_variable changed;
+  std::condition_variable isHeld;
+  std::vector<std::string> told;    // under the mutex, as the next two
+  std::vector<std::string> all;     // never forgotten
+  bool mustHold = false;            // keeps the watcher in its handler
+  std::vector<std::string> before;  // what waitFor() skipped
+  int witnesses = 0;
+  std::unique_ptr<DirectoryWatcher> watcher;
+};
+
+class WatchedDirectoryTest : public DirectoryWatcherTest {
+ protected:
+  WatchedDirectoryTest() {
+    fs::create_directories(watched);
+    watch();
+  }
+};
+
+TEST_F(WatchedDirectoryTest, AFileThatIsRewrittenIsTold) {
+  write(path("a"));
+  EXPECT_TRUE(waitFor("a"));
+  toldSoFar();
+  write(path("a"));
+  EXPECT_TRUE(waitFor("a"));
+}
+
+TEST_F(WatchedDirectoryTest, AFileThatIsOpenedForWritingAndClosedIsTold) {
+  write(path("a"));
+  toldSoFar();
+  std::ofstream(path("a"), std::ios::app).close();
+  EXPECT_TRUE(waitFor("a"));
+}
+
+TEST_F(WatchedDirectoryTest, AFileThatIsRenamedIntoPlaceIsTold) {
+  write(root.path("made"));
+  fs::rename(root.path("made"), path("a"));
+  EXPECT_TRUE(waitFor("a"));
+  toldSoFar();
+  write(root.path("made"));
+  fs::rename(root.path("made"), path("a"));  // over the old one
+  EXPECT_TRUE(waitFor("a"));
+}
+
+TEST_F(WatchedDirectoryTest, AFileThatIsLinkedIntoPlaceIsTold) {
+  write(root.path("made"));
+  fs::create_hard_link(root.path("made"), path("a"));
+  EXPECT_TRUE(waitFor("a"));
+}
+
+TEST_F(WatchedDirectoryTest, AFileThatIsMerelyCreatedIsNotTold) {
+  std::ofstream file(path("a"));
+  ASSERT_TRUE(file.is_open());
+  EXPECT_THAT(toldSoFar(), IsEmpty());
+  file.close();
+  EXPECT_TRUE(waitFor("a"));
+}
+
+// Once told of twice, when its creation was read only after it had been written to.
+TEST_F(WatchedDirectoryTest, AFileThatIsCreatedAndWrittenInOneGoIsToldOnce) {
+  hold();
+  write(path("a"));
+  release();
+  EXPECT_THAT(toldSoFar(), ElementsAre("a"));
+}
+
+TEST_F(WatchedDirectoryTest, AFileThatIsCreatedAndWrittenToIsNotToldBeforeItIsClosed) {
+  hold();
+  std::ofstream file(path("a"));
+  file << "1\n" << std::flush;
+  release();
+  EXPECT_THAT(toldSoFar(), IsEmpty());
+  file << "2\n";
+  file.close();
+  EXPECT_TRUE(waitFor("a"));
+  EXPECT_THAT(toldSoFar(), IsEmpty());
+}
+
+TEST_F(WatchedDirectoryTest, AFileThatSomebodyReadsWhileItIsMadeIsToldOnce) {
+  const auto read = [this] { std::ifstream(path("a")).get(); };
+  hold();
+  {
+    std::ofstream file(path("a"));
+    read();
+    file << "1\n" << std::flush;
+    read();
+  }
+  read();
+  release();
+  EXPECT_THAT(toldSoFar(), ElementsAre("a"));
+}
+
+TEST_F(WatchedDirectoryTest, EachWritingOfANewFileIsTold) {
+  hold();
+  write(path("a"));
+  write(path("b"));
+  write(path("a"));
+  release();
+  EXPECT_THAT(toldSoFar(), ElementsAre("a", "b", "a"));
+}
+
+TEST_F(WatchedDirectoryTest, ALinkIsToldOnceHoweverLateItsComingIsRead) {
+  write(root.path("made"));
+  hold();
+  fs::create_hard_link(root.path("made"), path("a"));
+  fs::remove(root.path("made"));
+  release();
+  EXPECT_TRUE(waitFor("a"));
+  EXPECT_THAT(toldSoFar(), IsEmpty());
+}
+
+TEST_F(WatchedDirectoryTest, ALinkThatSomebodyReadsIsToldOnce) {
+  write(root.path("made"));
+  hold();
+  fs::create_hard_link(root.path("made"), path("a"));
+  EXPECT_EQ(std::ifstream(path("a")).get(), '1');
+  EXPECT_EQ(std::ifstream(path("a")).get(), '1');
+  release();
+  EXPECT_TRUE(waitFor("a"));
+  EXPECT_THAT(toldSoFar(), IsEmpty());
+}
+
+TEST_F(WatchedDirectoryTest, ALinkThatSomebodyHasOpenToReadIsToldWhenItIsClosed) {
+  write(root.path("made"));
+  hold();
+  fs::create_hard_link(root.path("made"), path("a"));
+  std::ifstream file(path("a"));
+  ASSERT_TRUE(file.is_open());
+  release();
+  EXPECT_THAT(toldSoFar(), IsEmpty());
+  file.close();
+  EXPECT_TRUE(waitFor("a"));
+}
+
+TEST_F(WatchedDirectoryTest, ALinkThatIsWrittenToIsToldOnceWhenThatIsOver) {
+  write(root.path("made"));
+  hold();
+  fs::create_hard_link(root.path("made"), path("a"));
+  std::ofstream file(path("a"), std::ios::app);
+  file << "2\n" << std::flush;
+  release();
+  EXPECT_THAT(toldSoFar(), IsEmpty());
+  file.close();
+  EXPECT_THAT(toldSoFar(), ElementsAre("a"));
+}
+
+TEST_F(WatchedDirectoryTest, WhatIsGoneWhenItsComingIsReadIsNotTold) {
+  write(root.path("made"));
+  hold();
+  fs::create_hard_link(root.path("made"), path("a"));
+  fs::remove(path("a"));
+  release();
+  EXPECT_THAT(toldSoFar(), IsEmpty());
+}
+
+TEST_F(WatchedDirectoryTest, ReadingRemovingAndMovingAwayAreNotTold) {
+  write(path("a"));
+  write(path("b"));
+  toldSoFar();
+  std::string text;
+  std::getline(std::ifstream(path("a")), text);
+  EXPECT_EQ(text, "1");
+  fs::remove(path("a"));
+  fs::rename(path("b"), root.path("b"));
+  EXPECT_THAT(toldSoFar(), IsEmpty());
+}
+
+TEST_F(WatchedDirectoryTest, AFileThatWasRemovedIsToldWhenItIsThereAgain) {
+  write(path("a"));
+  EXPECT_TRUE(waitFor("a"));
+  toldSoFar();
+  fs::remove(path("a"));
+  write(path("a"));
+  EXPECT_TRUE(waitFor("a"));
+}
+
+TEST_F(WatchedDirectoryTest, WhatIsNoFileIsNotTold) {
+  fs::create_directory(path("folder"));
+  fs::create_directory(root.path("other"));
+  fs::rename(root.path("other"), path("other"));
+  fs::create_symlink(root.path("nowhere"), path("link"));
+  EXPECT_THAT(toldSoFar(), IsEmpty());
+}
+
+TEST_F(WatchedDirectoryTest, WhatHappensBesideTheDirectoryIsNotTold) {
+  write(parent + "/reporting.sock");
+  write(parent + "/watched2");
+  fs::create_directory(parent + "/channels");
+  EXPECT_THAT(toldSoFar(), IsEmpty());
+}
+
+// It is one event of the directory above, and queued every handler though nothing was posted.
+TEST_F(WatchedDirectoryTest, AChangedModeOfAWatchedDirectoryTellsNothing) {
+  fs::permissions(watched, fs::perms::owner_all);
+  fs::last_write_time(watched, fs::file_time_type::clock::now());
+  EXPECT_THAT(toldSoFar(), IsEmpty());
+}
+
+TEST_F(WatchedDirectoryTest, ADirectoryThatIsRemovedAndMadeAgainIsFollowed) {
+  for (int round = 0; round < 3; ++round) {
+    fs::remove_all(watched);
+    EXPECT_TRUE(waitFor(kEverything));
+    fs::create_directory(watched);
+    EXPECT_TRUE(isFollowed());
+  }
+}
+
+TEST_F(WatchedDirectoryTest, ADirectoryThatIsMovedAwayIsLetGoAndTheNewOneFollowed) {
+  fs::rename(watched, root.path("away"));
+  EXPECT_TRUE(waitFor(kEverything));
+  write(root.path("away/old"));
+  fs::create_directory(watched);
+  EXPECT_TRUE(isFollowed());
+  EXPECT_FALSE(wasEverTold("old"));
+}
+
+TEST_F(WatchedDirectoryTest, ADirectoryThatAnotherTakesThePlaceOfIsLetGo) {
+  fs::create_directory(parent + "/next");
+  write(parent + "/next/a");
+  fs::rename(parent + "/next", watched);
+  EXPECT_TRUE(waitFor(kEverything));
+  EXPECT_TRUE(isFollowed());
+}
+
+TEST_F(WatchedDirectoryTest, AParentThatIsRemovedAndMadeAgainIsFound) {
+  fs::remove_all(parent);
+  EXPECT_TRUE(waitFor(kEverything));
+  fs::create_directories(watched);
+  EXPECT_TRUE(isFollowed());
+}
+
+TEST_F(WatchedDirectoryTest, AParentThatIsMovedAwayIsLetGo) {
+  fs::rename(parent, root.path("away"));
+  EXPECT_TRUE(waitFor(kEverything));
+  write(root.path("away/watched/old"));
+  fs::create_directories(watched);
+  EXPECT_TRUE(isFollowed());
+  EXPECT_FALSE(wasEverTold("old"));
+}
+
+TEST_F(WatchedDirectoryTest, AnOverflowingEventQueueTellsEverything) {
+  std::size_t most = 0;
+  std::ifstream("/proc/sys/fs/inotify/max_queued_events") >> most;
+  if (most == 0 || most > 200'000) GTEST_SKIP() << "events that fit: " << most;
+  hold();
+  // Two names in turn, since the kernel joins equal events that follow each other.
+  for (std::size_t count = 0; count <= most / 2 + 1000; ++count) {
+    std::ofstream(path("a"), std::ios::app).close();
+    std::ofstream(path("b"), std::ios::app).close();
+  }
+  write(path("lost"));
+  release();
+  EXPECT_TRUE(waitFor(kEverything));
+  write(path("after"));
+  EXPECT_TRUE(waitFor("after"));
+}
+
+TEST_F(DirectoryWatcherTest, ADirectoryMayComeLater) {
+  fs::create_directories(parent);
+  watch();
+  EXPECT_TRUE(watcher->isWorking());
+  fs::create_directory(watched);
+  EXPECT_TRUE(waitFor(kEverything));
+  write(path("a"));
+  EXPECT_TRUE(waitFor("a"));
+  EXPECT_THAT(log.lines(), IsEmpty());
+}
+
+TEST_F(DirectoryWatcherTest, ADirectoryMayComeWithItsParent) {
+  watch();
+  fs::create_directories(watched);
+  EXPECT_TRUE(waitFor(kEverything));
+  // Everything is told again where the watcher saw the parent before the directory.
+  EXPECT_TRUE(isFollowed());
+}
+
+TEST_F(DirectoryWatcherTest, ADirectoryMayComeLevelByLevelWithAPauseAtEach) {
+  watched = root.path("a/b/c/d");
+  watch();
+  for (const char* level : {"a", "a/b", "a/b/c"}) {
+    fs::create_directory(root.path(level));
+    // Told of when the watcher has gone down to it.
+    EXPECT_TRUE(waitFor(kEverything)) << level;
+  }
+  fs::create_directory(watched);
+  EXPECT_TRUE(isFollowed());
+  EXPECT_THAT(log.lines(), IsEmpty());
+}
+
+TEST_F(DirectoryWatcherTest, AllDirectoriesAboveMayGoAndComeBack) {
+  watched = root.path("a/b/c/d");
+  fs::create_directories(watched);
+  watch();
+  for (int round = 0; round < 3; ++round) {
+    fs::remove_all(root.path("a"));
+    EXPECT_TRUE(waitFor(kEverything));
+    fs::create_directories(watched);
+    EXPECT_TRUE(isFollowed());
+  }
+}
+
+TEST_F(DirectoryWatcherTest, AFileInTheDirectorysPlaceIsWaitedOut) {
+  fs::create_directories(parent);
+  write(watched);
+  watch();
+  fs::remove(watched);
+  fs::create_directory(watched);
+  EXPECT_TRUE(isFollowed());
+}
+
+TEST_F(DirectoryWatcherTest, ADirectoryThatMayNotBeReadIsLoggedOnce) {
+  if (geteuid() == 0) GTEST_SKIP() << "root may read everything";
+  fs::create_directories(watched);
+  fs::permissions(watched, fs::perms::none);
+  watch();
+  EXPECT_THAT(log.textsOf("twrs", LogLevel::kError),
+              ::testing::ElementsAre("cannot watch " + watched + ": Permission denied"));
+  fs::permissions(watched, fs::perms::owner_all);
+}
+
+TEST_F(DirectoryWatcherTest, ADirectoryThatBecomesReadableIsFollowed) {
+  if (geteuid() != 0) GTEST_SKIP() << "only root can watch as somebody else";
+  constexpr auto kEverybodys = static_cast<fs::perms>(0755);
+  fs::create_directories(watched);
+  fs::permissions(root.path(), kEverybodys);
+  fs::permissions(parent, kEverybodys);
+  fs::permissions(watched, fs::perms::owner_all);
+  runAsStranger([this] { watch(); });  // the watcher's thread is one, too
+  fs::permissions(watched, kEverybodys);
+  EXPECT_TRUE(waitFor(kEverything));
+  write(path("a"));
+  EXPECT_TRUE(waitFor("a"));
+}
+
+}  // namespace
+}  // namespace tonewerk

@@ -1,0 +1,156 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/notifications/NotificationFiles.h"
+
+#include <cstdint>
+#include <filesystem>
+#include <fstream>
+#include <gmock/gmock.h>
+#include <limits>
+#include <string>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include "support/Stranger.h"
+#include "support/TemporaryDirectory.h"
+
+namespace tonewerk {
+namespace {
+
+using ::testing::UnorderedElementsAre;
+
+class NotificationFilesTest : public ::testing::Test {
+ protected:
+  void write(const std::string& name, const std::string& text) {
+    std::filesystem::create_directories(files.directory());
+    std::ofstream(files.directory() + "/" + name) << text;
+  }
+  // The state, or what is wrong with it.
+  std::optional<std::uint64_t> state(const std::string& name) { return files.state(name, error); }
+  std::vector<std::string> names() const {
+    std::vector<std::string> found;
+    for (const auto& entry : std::filesystem::directory_iterator(files.directory())) {
+      found.push_back(entry.path().filename().string());
+    }
+    return found;
+  }
+
+  TemporaryDirectory directory;
+  NotificationFiles files{directory.path("a/notifications")};
+  std::error_code error;
+};
+
+TEST_F(NotificationFilesTest, AStateIsADecimalNumberWithSpacesAroundIt) {
+  for (const auto& [text, expected] :
+       std::vector<std::pair<std::string, std::uint64_t>>{{"0", 0},
+                                                          {"1\n", 1},
+                                                          {" \t007\r\n\n", 7},
+                                                          {"18446744073709551615", UINT64_MAX},
+                                                          {std::string(63, ' ') + "5", 5}}) {
+    write("a", text);
+    EXPECT_EQ(state("a"), expected) << text;
+    EXPECT_FALSE(error);
+  }
+}
+
+TEST_F(NotificationFilesTest, WhatIsNoNumberOrTooMuchHasNoState) {
+  for (const std::string& text :
+       {std::string(), std::string("\n"), std::string("one"), std::string("-1"), std::string("+1"),
+        std::string("0x1"), std::string("1.0"), std::string("1 2"), std::string("1\0", 2),
+        std::string("18446744073709551616"), std::string(64, ' ') + "5", std::string(1 << 20, '1')}) {
+    write("a", text);
+    EXPECT_EQ(state("a"), std::nullopt) << text.substr(0, 70);
+    EXPECT_EQ(error, std::errc::result_out_of_range) << text.substr(0, 70);
+  }
+}
+
+TEST_F(NotificationFilesTest, WithoutAFileThereIsNoState) {
+  EXPECT_EQ(state("a"), std::nullopt);
+  EXPECT_EQ(error, std::errc::no_such_file_or_directory);
+  write("b", "1");
+  EXPECT_EQ(state("a"), std::nullopt);
+  EXPECT_EQ(error, std::errc::no_such_file_or_directory);
+}
+
+TEST_F(NotificationFilesTest, APostMakesTheDirectoryAndLeavesNothingElseInIt) {
+  EXPECT_FALSE(files.post("a"));
+  EXPECT_FALSE(files.post("b", 5));
+  EXPECT_FALSE(files.post("a", std::numeric_limits<std::uint64_t>::max()));
+  EXPECT_FALSE(files.post("b"));
+  EXPECT_THAT(names(), UnorderedElementsAre("a", "b"));
+  EXPECT_EQ(state("a"), std::numeric_limits<std::uint64_t>::max());
+  EXPECT_EQ(state("b"), 5U);
+}
+
+TEST_F(NotificationFilesTest, APostKeepsWhateverItsFileHolds) {
+  write("a", "no number");
+  EXPECT_FALSE(files.post("a"));
+  EXPECT_EQ(state("a"), std::nullopt);
+  EXPECT_FALSE(files.post("a", 3));
+  EXPECT_EQ(state("a"), 3U);
+}
+
+TEST_F(NotificationFilesTest, NamesThatAreNoFileNamesAreRefused) {
+  for (const std::string& name : {std::string(), std::string("."), std::string(".."), std::string("../b"),
+                                  std::string("/b"), std::string("a\0b", 3), std::string(256, 'a')}) {
+    EXPECT_EQ(files.post(name), std::errc::invalid_argument);
+    EXPECT_EQ(files.post(name, 1), std::errc::invalid_argument);
+    EXPECT_EQ(state(name), std::nullopt);
+    EXPECT_EQ(error, std::errc::invalid_argument);
+  }
+  EXPECT_FALSE(std::filesystem::exists(directory.path("a")));
+}
+
+TEST_F(NotificationFilesTest, ALinkDoesNotLeadOutOfTheDirectory) {
+  write("x", "");
+  std::ofstream(directory.path("outside")) << "41\n";
+  std::filesystem::create_symlink(directory.path("outside"), files.directory() + "/a");
+  EXPECT_EQ(state("a"), std::nullopt);
+  EXPECT_EQ(error, std::errc::too_many_symbolic_link_levels);
+  EXPECT_EQ(files.post("a"), std::errc::too_many_symbolic_link_levels);
+  EXPECT_FALSE(files.post("a", 1));  // takes the link's place
+  EXPECT_EQ(state("a"), 1U);
+  std::string outside;
+  std::getline(std::ifstream(directory.path("outside")), outside);
+  EXPECT_EQ(outside, "41");
+}
+
+TEST_F(NotificationFilesTest, WhatIsNoRegularFileIsRefusedAtOnce) {
+  std::filesystem::create_directories(files.directory() + "/folder");
+  ASSERT_EQ(mkfifo((files.directory() + "/pipe").c_str(), 0600), 0);
+  EXPECT_EQ(state("folder"), std::nullopt);
+  EXPECT_EQ(error, std::errc::invalid_argument);
+  EXPECT_EQ(state("pipe"), std::nullopt);
+  EXPECT_EQ(error, std::errc::invalid_argument);
+  EXPECT_TRUE(files.post("folder"));
+  EXPECT_TRUE(files.post("folder", 1));
+  EXPECT_TRUE(files.post("pipe"));
+  EXPECT_THAT(names(), UnorderedElementsAre("folder", "pipe"));
+}
+
+TEST_F(NotificationFilesTest, AFileInTheDirectorysPlaceIsAFailure) {
+  std::ofstream(directory.path("a")) << "in the way";
+  EXPECT_TRUE(files.post("b"));
+  EXPECT_TRUE(files.post("b", 1));
+  EXPECT_EQ(state("b"), std::nullopt);
+}
+
+TEST_F(NotificationFilesTest, WhatRootPostsTheDirectorysOwnerCanPostAgain) {
+  if (geteuid() != 0) GTEST_SKIP() << "only root can be root";
+  const std::string runtime = directory.path("a");
+  std::filesystem::create_directory(runtime);
+  ASSERT_EQ(chown(directory.path().c_str(), kStranger, kStranger), 0);
+  ASSERT_EQ(chown(runtime.c_str(), kStranger, kStranger), 0);
+  EXPECT_FALSE(files.post("stated", 5));
+  EXPECT_FALSE(files.post("unstated"));
+  runAsStranger([this] {
+    EXPECT_FALSE(files.post("stated"));
+    EXPECT_FALSE(files.post("unstated"));
+    EXPECT_FALSE(files.post("unstated", 7));
+    EXPECT_FALSE(files.post("another"));
+  });
+  EXPECT_EQ(state("stated"), 5);
+  EXPECT_EQ(state("unstated"), 7);
+}
+
+}  // namespace
+}  // namespace tonewerk

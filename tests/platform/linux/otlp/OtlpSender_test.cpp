@@ -1,0 +1,270 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/otlp/OtlpSender.h"
+
+#include <gmock/gmock.h>
+#include <zlib.h>
+
+#include "platform/LogCategory.h"
+#include "support/ManualClock.h"
+#include "support/MemoryLog.h"
+#include "support/ScriptedHttpClient.h"
+
+namespace tonewerk {
+namespace {
+
+using std::chrono::duration;
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::IsEmpty;
+using testing::SizeIs;
+using Urgency = OtlpOutbox::Urgency;
+
+HttpAnswer answerOf(int status, std::string body = {}, std::string retryAfter = {}) {
+  HttpAnswer answer;
+  answer.status = status;
+  answer.body = std::move(body);
+  answer.retryAfter = std::move(retryAfter);
+  return answer;
+}
+
+HttpAnswer noAnswer(const std::string& problem) {
+  HttpAnswer answer;
+  answer.problem = problem;
+  return answer;
+}
+
+std::string unpacked(const std::string& packed) {
+  std::string text(std::size_t{1} << 20, '\0');
+  z_stream stream{};
+  EXPECT_EQ(inflateInit2(&stream, 15 + 16), Z_OK);
+  stream.next_in = reinterpret_cast<Bytef*>(const_cast<char*>(packed.data()));
+  stream.avail_in = static_cast<uInt>(packed.size());
+  stream.next_out = reinterpret_cast<Bytef*>(text.data());
+  stream.avail_out = static_cast<uInt>(text.size());
+  EXPECT_EQ(inflate(&stream, Z_FINISH), Z_STREAM_END);
+  text.resize(stream.total_out);
+  inflateEnd(&stream);
+  return text;
+}
+
+class OtlpSenderTest : public testing::Test {
+ protected:
+  void add(const std::string& record, Urgency urgency = Urgency::kAtOnce) {
+    outbox_.add("\"" + record + "\"", urgency, clock_.monotonic());
+  }
+  // Sends what is due; the seconds until something will be, -1 when nothing waits.
+  double send() {
+    const auto wait = sender_.sendDue();
+    return wait ? duration<double>(*wait).count() : -1.0;
+  }
+  // What stands in the records' list of each request.
+  std::vector<std::string> sent() const {
+    std::vector<std::string> lists;
+    for (const HttpRequest& request : client_.requests) {
+      const std::string body = unpacked(request.body);
+      const std::string before = R"("logRecords":[)";
+      const std::size_t at = body.find(before) + before.size();
+      lists.push_back(body.substr(at, body.find(']', at) - at));
+    }
+    return lists;
+  }
+  std::vector<std::string> errors() const { return log_.textsOf("twrs", LogLevel::kError); }
+
+  ManualClock clock_;
+  MemoryLog log_;
+  LogCategory category_{log_, "com.orvane.tonewerk", "twrs"};
+  OtlpOutbox outbox_{{}};
+  ScriptedHttpClient client_;
+  OtlpResource resource_{"n", "v", "h", ""};
+  OtlpSender sender_{"http://fleet/v1/logs",         outbox_, client_,
+                     [this] { return resource_; },   clock_,  category_,
+                     RetryPolicy([] { return 1.0; })};
+};
+
+TEST_F(OtlpSenderTest, SendsNothingWhenNothingWaits) {
+  EXPECT_EQ(send(), -1.0);
+  EXPECT_THAT(client_.requests, IsEmpty());
+}
+
+TEST_F(OtlpSenderTest, PostsPackedJson) {
+  add("a");
+  EXPECT_EQ(send(), -1.0);
+  ASSERT_THAT(client_.requests, SizeIs(1));
+  EXPECT_EQ(client_.requests[0].url, "http://fleet/v1/logs");
+  EXPECT_THAT(client_.requests[0].headers,
+              ElementsAre("Content-Type: application/json", "Content-Encoding: gzip"));
+  EXPECT_THAT(sent(), ElementsAre("\"a\""));
+  EXPECT_EQ(outbox_.count(), 0U);
+}
+
+TEST_F(OtlpSenderTest, BatchedRecordsGoTogetherAfterFiveSeconds) {
+  add("a", Urgency::kBatched);
+  clock_.advance(2.0);
+  add("b", Urgency::kBatched);
+  EXPECT_EQ(send(), 3.0);
+  EXPECT_THAT(client_.requests, IsEmpty());
+  clock_.advance(3.0);
+  EXPECT_EQ(send(), -1.0);
+  EXPECT_THAT(sent(), ElementsAre("\"a\",\"b\""));
+}
+
+TEST_F(OtlpSenderTest, AsksForTheResourceAnewForEveryRequest) {
+  add("a");
+  send();
+  resource_.deviceIdentifier = "speaker-7";
+  add("b");
+  send();
+  EXPECT_THAT(unpacked(client_.requests[0].body), testing::Not(HasSubstr("speaker-7")));
+  EXPECT_THAT(unpacked(client_.requests[1].body), HasSubstr("speaker-7"));
+}
+
+TEST_F(OtlpSenderTest, TriesAgainLaterAndKeepsTheRecordsInOrder) {
+  client_.answers = {noAnswer("refused"), answerOf(503), answerOf(429)};
+  add("a");
+  EXPECT_EQ(send(), 5.0);
+  add("b");
+  clock_.advance(4.9);
+  EXPECT_NEAR(send(), 0.1, 1e-6);
+  EXPECT_THAT(client_.requests, SizeIs(1));
+  clock_.advance(0.1);
+  EXPECT_EQ(send(), 7.5);
+  clock_.advance(7.5);
+  EXPECT_EQ(send(), 11.25);
+  clock_.advance(11.25);
+  EXPECT_EQ(send(), -1.0);
+  EXPECT_THAT(sent(), ElementsAre("\"a\"", "\"a\"", "\"a\"", "\"a\"", "\"b\""));
+}
+
+TEST_F(OtlpSenderTest, SendsTheSameIdentifiersAgain) {
+  client_.answers = {noAnswer("the answer did not come")};
+  add("a");
+  send();
+  clock_.advance(5.0);
+  send();
+  EXPECT_EQ(unpacked(client_.requests[0].body), unpacked(client_.requests[1].body));
+}
+
+TEST_F(OtlpSenderTest, NeverGivesUpOnAnEndpointThatIsDown) {
+  for (int n = 0; n < 1000; ++n) client_.answers.push_back(noAnswer("refused"));
+  add("a");
+  for (int n = 0; n < 1000; ++n) {
+    EXPECT_GT(send(), 0.0);
+    clock_.advance(30.0);
+  }
+  EXPECT_EQ(send(), -1.0);
+  EXPECT_EQ(outbox_.count(), 0U);
+  EXPECT_THAT(errors(), ElementsAre(HasSubstr("http://fleet/v1/logs: refused; records are kept"),
+                                    HasSubstr("goes on; records dropped meanwhile: 0")));
+}
+
+TEST_F(OtlpSenderTest, WaitsAsLongAsTheEndpointAsks) {
+  client_.answers = {answerOf(429, "", " 60\r\n"), answerOf(503, "", "Thu, 20 Nov 2025 10:20:00 GMT\r\n")};
+  add("a");
+  EXPECT_EQ(send(), 60.0);
+  clock_.advance(60.0);
+  EXPECT_EQ(send(), 60.0);
+  clock_.advance(60.0);
+  EXPECT_EQ(send(), -1.0);
+}
+
+TEST_F(OtlpSenderTest, DropsAndCountsWhatIsRefusedAndSaysItOnce) {
+  client_.answers = {answerOf(400), answerOf(400), answerOf(307), answerOf(500)};
+  for (const char* record : {"a", "b", "c", "d", "e"}) {
+    add(record);
+    EXPECT_EQ(send(), -1.0);
+  }
+  EXPECT_THAT(errors(), ElementsAre(HasSubstr("HTTP status 400; what it refuses is dropped"),
+                                    HasSubstr("HTTP status 307"), HasSubstr("HTTP status 500"),
+                                    HasSubstr("goes on; records dropped meanwhile: 4")));
+  sender_.logLosses();
+  EXPECT_THAT(errors().back(), HasSubstr("dropped in all: 4"));
+}
+
+TEST_F(OtlpSenderTest, SendsHalvesOfWhatIsTooLarge) {
+  client_.answers = {answerOf(413), answerOf(413), answerOf(200), answerOf(413)};
+  for (const char* record : {"a", "b", "c", "d", "e"}) add(record);
+  EXPECT_EQ(send(), -1.0);
+  // All, the first half, its halves of which the second is too large alone, the second half.
+  EXPECT_THAT(sent(), ElementsAre("\"a\",\"b\",\"c\",\"d\",\"e\"", "\"a\",\"b\"", "\"a\"", "\"b\"",
+                                  "\"c\",\"d\",\"e\""));
+  EXPECT_THAT(errors(), ElementsAre(HasSubstr("a record is too large for it"),
+                                    HasSubstr("records dropped meanwhile: 1")));
+  EXPECT_EQ(outbox_.count(), 0U);
+  add(std::string((std::size_t{8} << 20) - 100, 'x'));
+  EXPECT_EQ(outbox_.takeDropped(), 0U);  // all the room came back
+}
+
+TEST_F(OtlpSenderTest, HalvesThatCannotGoNowAreKept) {
+  client_.answers = {answerOf(413), answerOf(503)};
+  add("a");
+  add("b");
+  EXPECT_EQ(send(), 5.0);
+  EXPECT_EQ(outbox_.count(), 2U);
+  clock_.advance(5.0);
+  EXPECT_EQ(send(), -1.0);
+  EXPECT_THAT(sent(), ElementsAre("\"a\",\"b\"", "\"a\"", "\"a\"", "\"b\""));
+}
+
+TEST_F(OtlpSenderTest, LogsAPartialSuccessAndDoesNotTryAgain) {
+  client_.answers = {
+      answerOf(200, R"({"partialSuccess":{"rejectedLogRecords":"2","errorMessage":"old\nnews"}})"),
+      answerOf(200, R"({"partialSuccess":{"errorMessage":"slow down"}})")};
+  for (const char* record : {"a", "b", "c"}) add(record);
+  EXPECT_EQ(send(), -1.0);
+  add("d");
+  EXPECT_EQ(send(), -1.0);
+  EXPECT_THAT(client_.requests, SizeIs(2));
+  EXPECT_THAT(errors(), ElementsAre("http://fleet/v1/logs rejected records: 2 (old?news)"));
+  EXPECT_THAT(log_.textsOf("twrs", LogLevel::kDefault), ElementsAre(HasSubstr("says: slow down")));
+  sender_.logLosses();
+  EXPECT_THAT(errors().back(), HasSubstr("dropped in all: 2"));
+}
+
+TEST_F(OtlpSenderTest, AnAnswerThatCannotBeReadIsSaidOnceAndTheRecordsAreDelivered) {
+  HttpAnswer cut = answerOf(200, "xxx");
+  cut.problem = "too long";
+  client_.answers = {answerOf(200, "<html>"), answerOf(200, "<html>"), cut, answerOf(200, "{}")};
+  for (const char* record : {"a", "b", "c", "d"}) {
+    add(record);
+    EXPECT_EQ(send(), -1.0);
+  }
+  EXPECT_EQ(outbox_.count(), 0U);
+  EXPECT_THAT(errors(), ElementsAre(HasSubstr("its answer cannot be read"),
+                                    HasSubstr("its answer is not whole: too long")));
+}
+
+TEST_F(OtlpSenderTest, SaysHowMuchWasDroppedForWantOfRoomWhenSendingGoesOn) {
+  client_.answers = {noAnswer("refused")};
+  add("a");
+  send();
+  for (int n = 0; n < 3; ++n) add(std::string(std::size_t{8} << 20, 'x'));
+  clock_.advance(5.0);
+  EXPECT_EQ(send(), -1.0);
+  EXPECT_THAT(errors().back(), HasSubstr("goes on; records dropped meanwhile: 3"));
+  sender_.logLosses();
+  EXPECT_THAT(errors().back(), HasSubstr("dropped in all: 3"));
+}
+
+TEST_F(OtlpSenderTest, AtTheEndSaysWhatIsLost) {
+  client_.answers = {noAnswer("refused")};
+  add("a");
+  send();
+  add("b");
+  sender_.logLosses();
+  EXPECT_THAT(errors().back(), HasSubstr("records lost that could not be sent to http://fleet/v1/logs: 2"));
+}
+
+TEST_F(OtlpSenderTest, InAHurryTriesOnceMoreUnlessTheEndpointAskedToWait) {
+  client_.answers = {noAnswer("refused"), answerOf(429, "", "60")};
+  add("a");
+  send();
+  sender_.hurry();
+  EXPECT_EQ(send(), 60.0);
+  EXPECT_THAT(client_.requests, SizeIs(2));
+  sender_.hurry();
+  EXPECT_EQ(send(), 60.0);
+  EXPECT_THAT(client_.requests, SizeIs(2));
+}
+
+}  // namespace
+}  // namespace tonewerk

@@ -1,0 +1,740 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/store/ReportStore.h"
+
+#include <atomic>
+#include <cmath>
+#include <filesystem>
+#include <fstream>
+#include <gmock/gmock.h>
+#include <memory>
+#include <random>
+#include <signal.h>
+#include <string>
+#include <sys/resource.h>
+#include <thread>
+#include <tuple>
+#include <vector>
+
+#include "platform/LogCategory.h"
+#include "support/ManualClock.h"
+#include "support/MemoryJsonService.h"
+#include "support/MemoryLog.h"
+#include "support/MemoryPreferenceStore.h"
+#include "support/TemporaryDirectory.h"
+
+namespace tonewerk {
+namespace {
+
+using std::chrono::seconds;
+using testing::AllOf;
+using testing::Each;
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::IsEmpty;
+using testing::SizeIs;
+
+constexpr seconds kLongEnough{30};
+constexpr double kDay = 86'400.0;
+
+struct Event {
+  std::int64_t id;
+  double recordedAt;
+  std::string name;
+  std::string payload;
+};
+
+class ReportStoreTest : public testing::Test {
+ protected:
+  void open(const ReportStore::Limits& limits = {}) {
+    store_.reset();
+    store_ = std::make_unique<ReportStore>(directory_, json_, preferences_, clock_, category_, limits);
+  }
+  void close() { store_.reset(); }
+
+  void record(const std::string& name, ValueMap payload) {
+    store_->recordEvent(clock_.now(), name, std::move(payload));
+  }
+  // `count` events, each with a payload of its own, numbered from `first`.
+  void recordNumbered(int count, int first = 0) {
+    for (int n = first; n < first + count; ++n) record("com.orvane.n", {{"n", n}});
+  }
+  void recordPower(int n, const std::string& text = "") {
+    store_->record(PowerRow{clock_.now(), 28, "power", {{"n", n}, {"text", text}}});
+  }
+  bool flush() { return store_->flush(kLongEnough); }
+
+  std::string file() const { return directory_ + "/reports.db"; }
+
+  std::vector<Event> events(const std::string& where = "1") {
+    SqliteDatabase database;
+    EXPECT_TRUE(database.open(file(), SqliteDatabase::Mode::kReadOnly, kLongEnough)) << database.problem();
+    SqliteStatement select = database.prepare(
+        "SELECT id, recorded_at, name, payload FROM analytics_event WHERE " + where + " ORDER BY id");
+    std::vector<Event> found;
+    while (select.step() == SqliteStatement::Step::kRow) {
+      found.push_back({select.integer(0), select.number(1), select.text(2), select.text(3)});
+    }
+    return found;
+  }
+  std::vector<std::string> payloads() {
+    std::vector<std::string> found;
+    for (const Event& event : events()) found.push_back(event.payload);
+    return found;
+  }
+  std::int64_t number(const std::string& sql) {
+    SqliteDatabase database;
+    EXPECT_TRUE(database.open(file(), SqliteDatabase::Mode::kReadOnly, kLongEnough)) << database.problem();
+    const auto found = database.number(sql);
+    EXPECT_TRUE(found) << sql << ": " << database.problem();
+    return found.value_or(-1);
+  }
+  std::vector<std::string> errors() { return log_.textsOf("twrs", LogLevel::kError); }
+
+  TemporaryDirectory temporary_;
+  std::string directory_ = temporary_.path("state");
+  ManualClock clock_;
+  MemoryLog log_;
+  LogCategory category_{log_, "com.orvane.tonewerk", "twrs"};
+  MemoryJsonService json_;
+  MemoryPreferenceStore preferences_;
+  std::unique_ptr<ReportStore> store_;
+};
+
+TEST_F(ReportStoreTest, KeepsAnEventWithItsTimeNameAndPayload) {
+  open();
+  record("com.orvane.telephony.Playback.Stop", {{"volume", 0.5}, {"device", "Speaker"}, {"at", Date{0.5}}});
+  ASSERT_TRUE(flush());
+
+  const std::vector<Event> found = events();
+  ASSERT_THAT(found, SizeIs(1));
+  EXPECT_EQ(found[0].recordedAt, ManualClock::kStart);
+  EXPECT_EQ(found[0].name, "com.orvane.telephony.Playback.Stop");
+  EXPECT_EQ(found[0].payload, R"({"volume":0.5,"device":"Speaker","at":"1970-01-01T00:00:00.5Z"})");
+  EXPECT_THAT(errors(), IsEmpty());
+}
+
+TEST_F(ReportStoreTest, KeepsEventsInTheOrderOfRecording) {
+  open();
+  recordNumbered(2500);
+  ASSERT_TRUE(flush());
+
+  const std::vector<Event> found = events();
+  ASSERT_THAT(found, SizeIs(2500));
+  for (int n = 0; n < 2500; ++n) {
+    EXPECT_EQ(found[static_cast<std::size_t>(n)].payload, "{\"n\":" + std::to_string(n) + "}");
+  }
+}
+
+TEST_F(ReportStoreTest, WritesTwoNamesOfOnePayloadAsOneRow) {
+  ReportStore::Limits patient;
+  patient.gather = kLongEnough;  // so that the thread does not take the first name before the second is there
+  open(patient);
+  const ValueMap payload{{"volume", 0.5}};
+  record("com.orvane.tonewerk.Playback.Stop", payload);
+  record("com.orvane.telephony.Playback.Stop", payload);
+  record("com.orvane.tonewerk.Playback.Stop", payload);
+  ASSERT_TRUE(flush());
+
+  EXPECT_EQ(number("SELECT count(*) FROM analytics_row"), 2);
+  const std::vector<Event> found = events();
+  ASSERT_THAT(found, SizeIs(3));
+  EXPECT_EQ(found[0].name, "com.orvane.tonewerk.Playback.Stop");
+  EXPECT_EQ(found[1].name, "com.orvane.telephony.Playback.Stop");
+  EXPECT_EQ(found[2].name, "com.orvane.tonewerk.Playback.Stop");
+  EXPECT_LT(found[0].id, found[1].id);
+  EXPECT_LT(found[1].id, found[2].id);
+  EXPECT_EQ(found[0].payload, found[1].payload);
+}
+
+TEST_F(ReportStoreTest, KeepsTheTimesOfEqualPayloadsRecordedApart) {
+  open();
+  const ValueMap payload{{"volume", 0.5}};
+  record("com.orvane.a", payload);
+  clock_.advance(2.0);
+  record("com.orvane.b", payload);
+  ASSERT_TRUE(flush());
+
+  const std::vector<Event> found = events();
+  ASSERT_THAT(found, SizeIs(2));
+  EXPECT_EQ(found[1].recordedAt, ManualClock::kStart + 2.0);
+}
+
+TEST_F(ReportStoreTest, KeepsMetricRecordsByteForByteBetweenEvents) {
+  open();
+  record("com.orvane.a", {{"n", 1}});
+  store_->record(MetricRow{clock_.now(), 0x5B0003, std::string("\x10\x00\x1a", 3)});
+  record("com.orvane.b", {{"n", 2}});
+  ASSERT_TRUE(flush());
+  SqliteDatabase database;
+  ASSERT_TRUE(database.open(file(), SqliteDatabase::Mode::kReadOnly, kLongEnough));
+  SqliteStatement select = database.prepare("SELECT posted_at, identifier, record FROM metric");
+  ASSERT_EQ(select.step(), SqliteStatement::Step::kRow);
+  EXPECT_EQ(select.number(0), clock_.now());
+  EXPECT_EQ(select.integer(1), 0x5B0003);
+  EXPECT_EQ(select.bytes(2), std::string("\x10\x00\x1a", 3));
+  EXPECT_EQ(select.step(), SqliteStatement::Step::kDone);
+  EXPECT_THAT(events(), SizeIs(2));
+}
+
+TEST_F(ReportStoreTest, UsesKnownNamesAgainAfterARestart) {
+  for (int run = 0; run < 2; ++run) {
+    open();
+    record("com.orvane.single", {{"n", 1}});
+    const ValueMap shared{{"n", 2}};
+    record("com.orvane.first", shared);
+    record("com.orvane.second", shared);
+    ASSERT_TRUE(flush());
+    close();
+  }
+  EXPECT_THAT(events("name = 'com.orvane.second'"), SizeIs(2));
+  EXPECT_THAT(events("name = 'com.orvane.single'"), SizeIs(2));
+  EXPECT_LE(number("SELECT count(*) FROM analytics_name"), 5);
+}
+
+TEST_F(ReportStoreTest, WritesWithoutBeingAsked) {
+  open();
+  recordNumbered(1);
+
+  SqliteDatabase reader;
+  ASSERT_TRUE(flush());  // the file is there
+  ASSERT_TRUE(reader.open(file(), SqliteDatabase::Mode::kReadOnly, kLongEnough));
+  recordNumbered(1, 1);
+  const auto deadline = std::chrono::steady_clock::now() + kLongEnough;
+  while (reader.number("SELECT count(*) FROM analytics_event") != 2) {
+    ASSERT_LT(std::chrono::steady_clock::now(), deadline);
+    std::this_thread::yield();
+  }
+}
+
+TEST_F(ReportStoreTest, WritesWhatIsLeftWhenItEnds) {
+  open();
+  recordNumbered(3000);
+  close();
+  EXPECT_THAT(events(), SizeIs(3000));
+  EXPECT_THAT(errors(), IsEmpty());
+}
+
+TEST_F(ReportStoreTest, MakesTheWholeSchema) {
+  open();
+  ASSERT_TRUE(flush());
+  recordNumbered(1);
+  ASSERT_TRUE(flush());
+
+  EXPECT_EQ(number("PRAGMA user_version"), 1);
+  EXPECT_EQ(number("PRAGMA auto_vacuum"), 2);
+  EXPECT_EQ(number("SELECT count(*) FROM (SELECT id, posted_at, identifier, record FROM metric)"), 0);
+  EXPECT_EQ(
+      number("SELECT count(*) FROM (SELECT id, recorded_at, event_group, name, payload FROM power_event)"),
+      0);
+  EXPECT_EQ(number("SELECT count(*) FROM (SELECT id, started_at, session_info, user_info FROM rtc_session)"),
+            0);
+  EXPECT_EQ(
+      number(
+          "SELECT count(*) FROM (SELECT id, sent_at, rtc_session, category, type, payload FROM rtc_message)"),
+      0);
+}
+
+TEST_F(ReportStoreTest, TakesEventsFromManyThreads) {
+  ReportStore::Limits limits;
+  limits.rows = 64;
+  limits.batchRows = 16;
+  limits.hold = kLongEnough;
+  open(limits);
+  std::vector<std::thread> producers;
+  producers.reserve(4);
+  for (int producer = 0; producer < 4; ++producer) {
+    producers.emplace_back([this, producer] { recordNumbered(500, producer * 1000); });
+  }
+  for (std::thread& producer : producers) producer.join();
+  ASSERT_TRUE(flush());
+  EXPECT_THAT(events(), SizeIs(2000));
+  EXPECT_THAT(errors(), IsEmpty());
+}
+
+TEST_F(ReportStoreTest, IsReadWhileItWrites) {
+  open();
+  recordNumbered(1);
+  ASSERT_TRUE(flush());
+  std::atomic<bool> done{false};
+  std::thread writer([&] {
+    recordNumbered(5000, 1);
+    EXPECT_TRUE(flush());
+    done = true;
+  });
+  std::int64_t last = 0;
+  while (!done) {
+    const std::int64_t count = number("SELECT count(*) FROM analytics_event");
+    EXPECT_GE(count, last);
+    last = count;
+  }
+  writer.join();
+  EXPECT_EQ(number("SELECT count(*) FROM analytics_event"), 5001);
+}
+
+// A file stands where the directory should be: also root cannot write there.
+class BrokenReportStoreTest : public ReportStoreTest {
+ protected:
+  BrokenReportStoreTest() { breakDirectory(); }
+  void breakDirectory() { std::ofstream(directory_) << "in the way"; }
+  void repairDirectory() { std::filesystem::remove(directory_); }
+
+  ReportStore::Limits small() {
+    ReportStore::Limits limits;
+    limits.rows = 4;
+    limits.hold = kLongEnough;
+    return limits;
+  }
+};
+
+TEST_F(BrokenReportStoreTest, SaysOnceThatItCannotWrite) {
+  open();
+  recordNumbered(1);
+  EXPECT_FALSE(flush());
+  recordNumbered(1);
+  EXPECT_FALSE(flush());
+  EXPECT_THAT(errors(), ElementsAre(AllOf(HasSubstr("cannot write"), HasSubstr(file()))));
+}
+
+TEST_F(BrokenReportStoreTest, WritesWhatItKeptWhenTheDiskIsBack) {
+  open();
+  recordNumbered(3);
+  EXPECT_FALSE(flush());
+  repairDirectory();
+  EXPECT_TRUE(flush());
+  EXPECT_THAT(payloads(), ElementsAre(R"({"n":0})", R"({"n":1})", R"({"n":2})"));
+  EXPECT_THAT(errors(), ElementsAre(HasSubstr("cannot write"), HasSubstr("rows dropped meanwhile: 0")));
+}
+
+TEST_F(BrokenReportStoreTest, NeverHoldsWhoRecordsAndCountsWhatItDrops) {
+  open(small());
+  recordNumbered(10);  // returns, though only four fit and nothing is ever written
+  EXPECT_FALSE(flush());
+  repairDirectory();
+  EXPECT_TRUE(flush());
+  EXPECT_THAT(payloads(), ElementsAre(R"({"n":0})", R"({"n":1})", R"({"n":2})", R"({"n":3})"));
+  EXPECT_THAT(errors(), ElementsAre(HasSubstr("cannot write"), HasSubstr("rows dropped meanwhile: 6")));
+}
+
+TEST_F(BrokenReportStoreTest, CountsAtTheEndWhatIsLost) {
+  open(small());
+  recordNumbered(10);
+  close();
+  EXPECT_THAT(errors(), ElementsAre(HasSubstr("cannot write"),
+                                    HasSubstr("could not be written to " + file() + ": 10")));
+}
+
+TEST_F(BrokenReportStoreTest, SaysAnewWhenItBreaksAgain) {
+  open();
+  recordNumbered(1);
+  EXPECT_FALSE(flush());
+  repairDirectory();
+  recordNumbered(1);
+  EXPECT_TRUE(flush());
+  std::filesystem::remove_all(directory_);
+  breakDirectory();
+  recordNumbered(1);
+  EXPECT_FALSE(flush());
+  EXPECT_THAT(errors(),
+              ElementsAre(HasSubstr("cannot write"), HasSubstr("goes on"), HasSubstr("cannot write")));
+}
+
+TEST_F(ReportStoreTest, MakesANewFileWhenSomebodyTookItAway) {
+  open();
+  recordNumbered(1);
+  ASSERT_TRUE(flush());
+  std::filesystem::remove_all(directory_);
+  recordNumbered(1, 1);
+  ASSERT_TRUE(flush());
+  EXPECT_THAT(payloads(), ElementsAre(R"({"n":1})"));
+}
+
+// The limit on a file's size stands for a full disk; it holds for root too.
+class FullDisk {
+ public:
+  explicit FullDisk(rlim_t bytes) {
+    signal(SIGXFSZ, SIG_IGN);
+    getrlimit(RLIMIT_FSIZE, &before_);
+    const rlimit limit{bytes, before_.rlim_max};
+    setrlimit(RLIMIT_FSIZE, &limit);
+  }
+  FullDisk(const FullDisk&) = delete;
+  FullDisk& operator=(const FullDisk&) = delete;
+  ~FullDisk() { setrlimit(RLIMIT_FSIZE, &before_); }
+
+ private:
+  rlimit before_{};
+};
+
+TEST_F(ReportStoreTest, GoesOnWhereItWasWhenAFullDiskHasRoomAgain) {
+  open();
+  recordNumbered(1);
+  ASSERT_TRUE(flush());
+  {
+    const FullDisk full(4096);
+    recordNumbered(2000, 1);
+    EXPECT_FALSE(flush());
+    EXPECT_THAT(errors(), ElementsAre(HasSubstr("cannot write")));
+  }
+  ASSERT_TRUE(flush());
+  EXPECT_THAT(events(), SizeIs(2001));
+  EXPECT_EQ(payloads().back(), R"({"n":2000})");
+  EXPECT_FALSE(std::filesystem::exists(file() + ".corrupt"));
+}
+
+TEST_F(ReportStoreTest, WaitsOutAnotherWriter) {
+  open();
+  ASSERT_TRUE(flush());
+  recordNumbered(1);
+  ASSERT_TRUE(flush());
+  SqliteDatabase other;
+  ASSERT_TRUE(other.open(file(), SqliteDatabase::Mode::kReadWrite, kLongEnough));
+  ASSERT_TRUE(other.run("BEGIN IMMEDIATE"));
+  recordNumbered(1, 1);
+  EXPECT_FALSE(flush());
+  ASSERT_TRUE(other.run("ROLLBACK"));
+  EXPECT_TRUE(flush());
+  EXPECT_THAT(events(), SizeIs(2));
+}
+
+TEST_F(ReportStoreTest, MovesAFileThatIsNoDatabaseAside) {
+  std::filesystem::create_directories(directory_);
+  std::ofstream(file()) << std::string(100'000, 'x');
+  open();
+  recordNumbered(1);
+  ASSERT_TRUE(flush());
+  EXPECT_THAT(events(), SizeIs(1));
+  EXPECT_EQ(std::filesystem::file_size(file() + ".corrupt"), 100'000U);
+  EXPECT_THAT(errors(), ElementsAre(HasSubstr("damaged")));
+}
+
+TEST_F(ReportStoreTest, MovesADamagedDatabaseAsideAndKeepsWhatWasToBeWritten) {
+  open();
+  recordNumbered(2000);
+  ASSERT_TRUE(flush());
+  close();
+  {
+    std::fstream damaged(file(), std::ios::in | std::ios::out | std::ios::binary);
+    const std::string garbage(std::filesystem::file_size(file()) - 200, '\xff');
+    damaged.seekp(200);
+    damaged << garbage;
+  }
+  open();
+  recordNumbered(3);
+  ASSERT_TRUE(flush());
+  EXPECT_THAT(payloads(), ElementsAre(R"({"n":0})", R"({"n":1})", R"({"n":2})"));
+  EXPECT_TRUE(std::filesystem::exists(file() + ".corrupt"));
+  EXPECT_THAT(errors(), ElementsAre(HasSubstr("damaged")));
+}
+
+TEST_F(ReportStoreTest, LeavesAFileOfANewerVersionAlone) {
+  open();
+  recordNumbered(1);
+  ASSERT_TRUE(flush());
+  close();
+  SqliteDatabase other;
+  ASSERT_TRUE(other.open(file(), SqliteDatabase::Mode::kReadWrite, kLongEnough));
+  ASSERT_TRUE(other.run("PRAGMA user_version = 2"));
+  other.close();
+
+  open();
+  recordNumbered(1, 1);
+  EXPECT_FALSE(flush());
+  close();
+  EXPECT_THAT(events(), SizeIs(1));
+  EXPECT_EQ(number("PRAGMA user_version"), 2);
+  EXPECT_THAT(errors(),
+              ElementsAre(HasSubstr("newer version (schema 2)"), HasSubstr("could not be written")));
+}
+
+TEST_F(ReportStoreTest, DeletesWhatIsOlderThanTheBound) {
+  open();
+  recordNumbered(700);
+  clock_.advance(20 * kDay);
+  recordNumbered(10, 1000);
+  ASSERT_TRUE(flush());
+  EXPECT_THAT(events(), SizeIs(710));
+
+  clock_.advance(11 * kDay);
+  recordNumbered(1, 2000);
+  ASSERT_TRUE(flush());
+  EXPECT_THAT(events(), SizeIs(11));
+}
+
+TEST_F(ReportStoreTest, TakesTheDaysFromThePreferences) {
+  preferences_.configure("com.orvane.tonewerk.store", "max_days", 2);
+  open();
+  recordNumbered(5);
+  ASSERT_TRUE(flush());
+  clock_.advance(3 * kDay);
+  recordNumbered(1, 5);
+  ASSERT_TRUE(flush());
+  EXPECT_THAT(payloads(), ElementsAre(R"({"n":5})"));
+}
+
+TEST_F(ReportStoreTest, NeverGivesOutAnIdentifierAgain) {
+  open();
+  recordNumbered(3);
+  ASSERT_TRUE(flush());
+  const std::int64_t last = events().back().id;
+  close();
+  clock_.advance(31 * kDay);
+  open();
+  recordNumbered(1, 3);
+  ASSERT_TRUE(flush());
+  clock_.advance(60.0);
+  recordNumbered(1, 4);
+  ASSERT_TRUE(flush());
+  ASSERT_THAT(payloads(), ElementsAre(R"({"n":3})", R"({"n":4})"));
+  EXPECT_GT(events().front().id, last);
+}
+
+TEST_F(ReportStoreTest, KeepsTheFileWithinItsBoundByDeletingTheOldest) {
+  preferences_.configure("com.orvane.tonewerk.store", "max_megabytes", 2);
+  open();
+  const std::string text(1000, 'x');
+  for (int n = 0; n < 6000; ++n) {
+    clock_.advance(0.01);
+    record("com.orvane.n", {{"n", n}, {"text", text}});
+  }
+  ASSERT_TRUE(flush());
+
+  const std::vector<Event> found = events();
+  EXPECT_THAT(found.back().payload, HasSubstr("\"n\":5999,"));
+  EXPECT_GT(found.size(), 900U);
+  EXPECT_LT(found.size(), 2000U);
+  close();
+  EXPECT_LE(std::filesystem::file_size(file()), 2U << 20);
+}
+
+TEST_F(ReportStoreTest, ShrinksTheFileWhenTheBoundIsLowered) {
+  open();
+  const std::string text(1000, 'x');
+  for (int n = 0; n < 6000; ++n) record("com.orvane.n", {{"n", n}, {"text", text}});
+  ASSERT_TRUE(flush());
+  EXPECT_GT(number("PRAGMA page_count") * number("PRAGMA page_size"), 5 << 20);
+  close();
+
+  preferences_.configure("com.orvane.tonewerk.store", "max_megabytes", 1);
+  open();
+  recordNumbered(1);
+  ASSERT_TRUE(flush());
+  close();
+  EXPECT_LE(std::filesystem::file_size(file()), 1U << 20);
+  EXPECT_THAT(events(), Each(testing::Field(&Event::name, "com.orvane.n")));
+  EXPECT_GT(events().size(), 300U);
+}
+
+TEST_F(ReportStoreTest, DeletesTheOldestRowsOfWhateverTable) {
+  open();
+  ASSERT_TRUE(flush());
+  recordNumbered(1);
+  ASSERT_TRUE(flush());
+  close();
+  SqliteDatabase other;
+  ASSERT_TRUE(other.open(file(), SqliteDatabase::Mode::kReadWrite, kLongEnough));
+  const std::string old = std::to_string(ManualClock::kStart - 31 * kDay);
+  const std::string young = std::to_string(ManualClock::kStart);
+  for (const std::string& time : {old, young}) {
+    ASSERT_TRUE(
+        other.run("INSERT INTO metric (posted_at, identifier, record) VALUES (" + time + ", 1, x'00')"));
+    ASSERT_TRUE(other.run("INSERT INTO rtc_message (sent_at, rtc_session, category, type, payload) VALUES (" +
+                          time + ", 1, 1, 1, '{}')"));
+  }
+  other.close();
+
+  open();
+  recordNumbered(1, 1);
+  ASSERT_TRUE(flush());
+  EXPECT_EQ(number("SELECT count(*) FROM metric"), 1);
+  EXPECT_EQ(number("SELECT count(*) FROM rtc_message"), 1);
+  EXPECT_THAT(events(), SizeIs(2));
+}
+
+TEST_F(ReportStoreTest, KeepsPowerEventsBetweenAnalyticsEventsInTheirOrder) {
+  open();
+  for (int n = 0; n < 600; ++n) {
+    recordNumbered(1, n);
+    recordPower(n);
+  }
+  ASSERT_TRUE(flush());
+  EXPECT_THAT(events(), SizeIs(600));
+  EXPECT_EQ(number("SELECT count(*) FROM power_event"), 600);
+  EXPECT_EQ(number("SELECT count(*) FROM power_event WHERE payload ->> 'n' <> id - 1"), 0);
+}
+
+TEST_F(ReportStoreTest, DeletesPowerEventsThatAreOlderThanTheBound) {
+  open();
+  recordPower(1);
+  recordPower(2);
+  clock_.advance(20 * kDay);
+  recordPower(3);
+  ASSERT_TRUE(flush());
+  clock_.advance(11 * kDay);
+  recordPower(4);
+  ASSERT_TRUE(flush());
+  EXPECT_EQ(number("SELECT min(payload ->> 'n') FROM power_event"), 3);
+  EXPECT_EQ(number("SELECT count(*) FROM power_event"), 2);
+}
+
+TEST_F(ReportStoreTest, DeletesTheOldestPowerEventsToKeepTheFileWithinItsBound) {
+  preferences_.configure("com.orvane.tonewerk.store", "max_megabytes", 2);
+  open();
+  const std::string text(1000, 'x');
+  for (int n = 0; n < 6000; ++n) {
+    clock_.advance(0.01);
+    if (n % 2 == 0) {
+      recordPower(n, text);
+    } else {
+      record("com.orvane.n", {{"n", n}, {"text", text}});
+    }
+  }
+  ASSERT_TRUE(flush());
+  const std::int64_t oldest = number("SELECT min(payload ->> 'n') FROM power_event");
+  EXPECT_EQ(number("SELECT max(payload ->> 'n') FROM power_event"), 5998);
+  EXPECT_EQ(number("SELECT count(*) FROM power_event"), (6000 - oldest) / 2);  // none between is missing
+  EXPECT_GT(oldest, 4000);
+  EXPECT_LT(oldest, 5200);
+  // Both tables reach back to about the same time.
+  EXPECT_NEAR(static_cast<double>(number("SELECT min(payload ->> 'n') FROM analytics_event")),
+              static_cast<double>(oldest), 1100.0);
+  close();
+  EXPECT_LE(std::filesystem::file_size(file()), 2U << 20);
+}
+
+class BoundedReportStoreTest : public ReportStoreTest {
+ protected:
+  void openBoundedTo(int megabytes) {
+    preferences_.configure("com.orvane.tonewerk.store", "max_megabytes", megabytes);
+    bounds_.bytes = std::int64_t{megabytes} << 20;
+    open();
+  }
+  // A row of that many bytes, now in one table, now in another.
+  void recordRow(int n, std::size_t bytes) {
+    clock_.advance(0.01);
+    const std::string text(bytes, 'x');
+    if (n % 3 == 0) {
+      recordPower(n, text);
+    } else {
+      record("com.orvane.n", {{"n", n}, {"text", text}});
+    }
+  }
+  // How much of the database file's part of the bound is in use.
+  double usedPart() {
+    const std::int64_t pages = number("PRAGMA page_count") - number("PRAGMA freelist_count");
+    return static_cast<double>(pages * number("PRAGMA page_size")) / static_cast<double>(bounds_.fileBytes());
+  }
+  // The numbers of all rows that are left, of both tables.
+  std::vector<std::int64_t> numbersLeft() {
+    std::vector<std::int64_t> numbers;
+    SqliteDatabase database;
+    EXPECT_TRUE(database.open(file(), SqliteDatabase::Mode::kReadOnly, kLongEnough)) << database.problem();
+    SqliteStatement select = database.prepare(
+        "SELECT payload ->> 'n' AS n FROM analytics_row UNION SELECT payload ->> 'n' FROM power_event "
+        "ORDER BY n");
+    while (select.step() == SqliteStatement::Step::kRow) numbers.push_back(select.integer(0));
+    return numbers;
+  }
+  // Nothing is missing between the oldest row and the last of `count`.
+  void expectTheNewestOf(int count) {
+    const std::vector<std::int64_t> numbers = numbersLeft();
+    ASSERT_FALSE(numbers.empty());
+    EXPECT_EQ(numbers.back(), count - 1);
+    EXPECT_EQ(numbers.back() - numbers.front(), static_cast<std::int64_t>(numbers.size()) - 1);
+  }
+
+  StoreBounds bounds_;
+};
+
+// 500 rows at once were deleted of each table, which with the smallest bound was all but the newest.
+TEST_F(BoundedReportStoreTest, KeepsAsManyRowsOfAKilobyteAsTheSmallestBoundHasRoomFor) {
+  openBoundedTo(1);
+  for (int n = 0; n < 3000; ++n) {
+    recordRow(n, 1000);
+    if (n % 100 != 99) continue;
+    ASSERT_TRUE(flush());
+    if (n < 1000) continue;
+    EXPECT_GE(usedPart(), 0.9) << "after " << n;
+    EXPECT_LE(usedPart(), 1.0) << "after " << n;
+  }
+  expectTheNewestOf(3000);
+  EXPECT_GT(numbersLeft().size(), 550U);
+}
+
+TEST_F(BoundedReportStoreTest, DeletesByBytesWhereRowsOfAHundredLieBetweenRowsOfHalfAMegabyte) {
+  openBoundedTo(16);
+  for (int n = 0; n < 6000; ++n) recordRow(n, n % 100 == 50 ? 500'000 : 100);
+  ASSERT_TRUE(flush());
+  EXPECT_GE(usedPart(), 0.9);
+  EXPECT_LE(usedPart(), 1.0);
+  expectTheNewestOf(6000);
+}
+
+// A summary of a whole session may be larger than a small bound, and is the newest row of its table for long.
+TEST_F(BoundedReportStoreTest, ANewestRowThatTheBoundHasNoRoomForIsEmptiedAndCostsNoOthers) {
+  openBoundedTo(1);
+  for (int n = 0; n < 400; ++n) record("com.orvane.n", {{"n", n}, {"text", std::string(1000, 'x')}});
+  recordPower(1000, std::string(3'000'000, 'x'));
+  ASSERT_TRUE(flush());
+  for (int n = 400; n < 600; ++n) record("com.orvane.n", {{"n", n}, {"text", std::string(1000, 'x')}});
+  ASSERT_TRUE(flush());
+  EXPECT_LE(usedPart(), 1.0);
+  EXPECT_GT(events().size(), 500U);
+  EXPECT_EQ(number("SELECT count(*) FROM power_event WHERE payload = '{}'"), 1);
+}
+
+TEST_F(BoundedReportStoreTest, KeepsToANewBoundAtOnceWhenItIsToldToReadItAgain) {
+  openBoundedTo(8);
+  for (int n = 0; n < 3000; ++n) recordRow(n, 1000);
+  ASSERT_TRUE(flush());
+  preferences_.configure("com.orvane.tonewerk.store", "max_megabytes", 1);
+  bounds_.bytes = 1 << 20;
+  recordRow(3000, 1000);
+  ASSERT_TRUE(flush());
+  EXPECT_GT(usedPart(), 3.0);  // the clock has not come to the next look
+
+  store_->readBoundsAgain();
+  recordRow(3001, 1000);
+  ASSERT_TRUE(flush());
+  close();  // with what trimming was begun
+  EXPECT_LE(usedPart(), 1.0);
+  expectTheNewestOf(3002);
+}
+
+TEST_F(BoundedReportStoreTest, WhatStaysIsBetweenNineTenthsOfTheBoundAndAllOfItWhateverTheRows) {
+  for (unsigned seed = 1; seed <= 8; ++seed) {
+    SCOPED_TRACE(seed);
+    std::mt19937 random(seed);
+    // Small rows mostly, now and then one of up to a 30th of the bound; just over a page is the worst fit.
+    std::uniform_real_distribution<double> logarithm(2.0, std::log(50'000.0));
+    openBoundedTo(2);
+    std::size_t written = 0;
+    int count = 0;
+    while (written < std::size_t{5} << 20) {
+      const std::size_t bytes = seed == 8 ? 8300 : static_cast<std::size_t>(std::exp(logarithm(random)));
+      written += bytes;
+      recordRow(count++, bytes);
+    }
+    ASSERT_TRUE(flush());
+    EXPECT_GE(usedPart(), 0.9);
+    EXPECT_LE(usedPart(), 1.0);
+    expectTheNewestOf(count);
+    close();
+    std::filesystem::remove_all(directory_);
+  }
+}
+
+TEST_F(ReportStoreTest, LeavesOutBoundsThatAreNoNumberFromOne) {
+  preferences_.configure("com.orvane.tonewerk.store", "max_megabytes", "much");
+  preferences_.configure("com.orvane.tonewerk.store", "max_days", 0);
+  open();
+  recordNumbered(1);
+  ASSERT_TRUE(flush());
+  clock_.advance(60.0);
+  recordNumbered(1, 1);
+  ASSERT_TRUE(flush());
+  EXPECT_THAT(events(), SizeIs(2));
+  EXPECT_THAT(errors(), ElementsAre(AllOf(HasSubstr("max_megabytes = much"), HasSubstr("max_days = 0"))));
+}
+
+}  // namespace
+}  // namespace tonewerk

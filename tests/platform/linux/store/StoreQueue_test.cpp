@@ -1,0 +1,146 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/store/StoreQueue.h"
+
+#include <future>
+#include <gmock/gmock.h>
+#include <vector>
+
+namespace tonewerk {
+namespace {
+
+using std::chrono::milliseconds;
+using testing::IsEmpty;
+using testing::SizeIs;
+
+constexpr milliseconds kLongEnough{30'000};
+
+AnalyticsRow row(int n) { return {0.0, {SharedString("a"), SharedString()}, {{"n", n}}}; }
+
+StoreQueue::Limits small() {
+  StoreQueue::Limits limits;
+  limits.rows = 2;
+  limits.gather = milliseconds(0);
+  limits.hold = kLongEnough;
+  return limits;
+}
+
+class StoreQueueTest : public testing::Test {
+ protected:
+  StoreQueue queue_{small()};
+  std::vector<StoreRow> batch_;
+};
+
+TEST_F(StoreQueueTest, MakesWhoAddsWaitUntilThereIsRoom) {
+  queue_.add(row(0));
+  queue_.add(row(1));
+  auto third = std::async(std::launch::async, [&] { return queue_.add(row(2)); });
+  ASSERT_TRUE(queue_.take(batch_, true));
+  EXPECT_THAT(batch_, SizeIs(2));
+  queue_.committed();
+  EXPECT_FALSE(third.get());
+  ASSERT_TRUE(queue_.take(batch_, true));
+  EXPECT_THAT(batch_, SizeIs(1));
+  EXPECT_EQ(queue_.takeDropped(), 0U);
+  queue_.committed();
+}
+
+TEST_F(StoreQueueTest, CountsRowsUntilTheyAreCommitted) {
+  queue_.add(row(0));
+  queue_.add(row(1));
+  ASSERT_TRUE(queue_.take(batch_, true));
+  queue_.failed();
+  queue_.add(row(2));
+  EXPECT_EQ(queue_.lost(), 3U);
+  EXPECT_EQ(queue_.takeDropped(), 1U);
+  queue_.committed();
+  queue_.add(row(3));
+  ASSERT_TRUE(queue_.take(batch_, true));
+  EXPECT_THAT(batch_, SizeIs(1));
+}
+
+TEST_F(StoreQueueTest, LetsWhoWaitsGoWhenWritingFails) {
+  queue_.add(row(0));
+  queue_.add(row(1));
+  auto third = std::async(std::launch::async, [&] { return queue_.add(row(2)); });
+  ASSERT_TRUE(queue_.take(batch_, true));
+  queue_.failed();
+  EXPECT_FALSE(third.get());
+  EXPECT_EQ(queue_.takeDropped(), 1U);
+  queue_.committed();
+}
+
+TEST_F(StoreQueueTest, TakesARowLargerThanAllItsRoomAlone) {
+  StoreQueue::Limits limits = small();
+  limits.bytes = 10;
+  StoreQueue queue(limits);
+  queue.add(row(0));
+  ASSERT_TRUE(queue.take(batch_, true));
+  EXPECT_THAT(batch_, SizeIs(1));
+}
+
+TEST_F(StoreQueueTest, HoldsNobodyLongerThanTheHoldTimeAndSaysSoOnce) {
+  StoreQueue::Limits limits = small();
+  limits.hold = milliseconds(1);
+  StoreQueue queue(limits);
+  queue.add(row(0));
+  queue.add(row(1));
+  EXPECT_TRUE(queue.add(row(2)));
+  EXPECT_FALSE(queue.add(row(3)));
+  ASSERT_TRUE(queue.take(batch_, true));
+  EXPECT_EQ(queue.takeDropped(), 2U);
+  queue.committed();
+}
+
+TEST_F(StoreQueueTest, FlushEndsWithTheCommit) {
+  queue_.add(row(0));
+  auto flushed = std::async(std::launch::async, [&] { return queue_.flush(kLongEnough); });
+  ASSERT_TRUE(queue_.take(batch_, true));
+  queue_.attempt();
+  queue_.committed();
+  EXPECT_TRUE(flushed.get());
+}
+
+TEST_F(StoreQueueTest, FlushIsTriedOnceMoreBeforeItFails) {
+  queue_.add(row(0));
+  ASSERT_TRUE(queue_.take(batch_, true));
+  queue_.attempt();
+  queue_.failed();
+  auto flushed = std::async(std::launch::async, [&] { return queue_.flush(kLongEnough); });
+  EXPECT_TRUE(queue_.pause(kLongEnough));  // ended by the flush
+  queue_.attempt();
+  queue_.failed();
+  EXPECT_FALSE(flushed.get());
+}
+
+TEST_F(StoreQueueTest, FlushGivesUpAfterItsTime) {
+  queue_.add(row(0));
+  EXPECT_FALSE(queue_.flush(milliseconds(1)));
+}
+
+TEST_F(StoreQueueTest, FlushOfNothingIsDone) { EXPECT_TRUE(queue_.flush(kLongEnough)); }
+
+TEST_F(StoreQueueTest, GivesWhatIsLeftBeforeItStops) {
+  queue_.add(row(0));
+  queue_.stop();
+  EXPECT_TRUE(queue_.take(batch_, true));
+  EXPECT_THAT(batch_, SizeIs(1));
+  queue_.committed();
+  EXPECT_FALSE(queue_.take(batch_, true));
+  EXPECT_THAT(batch_, IsEmpty());
+  EXPECT_FALSE(queue_.pause(kLongEnough));
+}
+
+TEST_F(StoreQueueTest, ANudgedWriterComesBackWithoutRows) {
+  queue_.nudge();
+  ASSERT_TRUE(queue_.take(batch_, true));
+  EXPECT_THAT(batch_, IsEmpty());
+  queue_.committed();
+
+  auto writer = std::async(std::launch::async, [this] { return queue_.take(batch_, true); });
+  queue_.nudge();
+  EXPECT_TRUE(writer.get());
+  EXPECT_THAT(batch_, IsEmpty());
+}
+
+}  // namespace
+}  // namespace tonewerk

@@ -1,0 +1,179 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/store/StoreReader.h"
+
+#include <cmath>
+#include <filesystem>
+#include <fstream>
+#include <gmock/gmock.h>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "platform/LogCategory.h"
+#include "platform/linux/store/ReportStore.h"
+#include "support/ManualClock.h"
+#include "support/MemoryJsonService.h"
+#include "support/MemoryLog.h"
+#include "support/MemoryPreferenceStore.h"
+#include "support/TemporaryDirectory.h"
+
+namespace tonewerk {
+namespace {
+
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::IsEmpty;
+
+class StoreReaderTest : public testing::Test {
+ protected:
+  void openStore() {
+    store_ = std::make_unique<ReportStore>(directory_.path(), json_, preferences_, clock_, category_);
+  }
+  // Ten seconds after the one before.
+  void record(const std::string& name) {
+    clock_.advance(10.0);
+    store_->recordEvent(clock_.now(), name, {{"n", ++recorded_}});
+    EXPECT_TRUE(store_->flush(std::chrono::seconds(30)));
+  }
+  std::vector<std::string> payloads(const EventFilter& filter = {}) {
+    std::vector<std::string> found;
+    EXPECT_TRUE(reader_.readEvents(filter, [&](const StoredEvent& event) {
+      found.push_back(event.payload);
+      lastId_ = event.id;
+    })) << reader_.problem();
+    return found;
+  }
+  StoreReader::Outcome open() { return reader_.open(directory_.path()); }
+
+  TemporaryDirectory directory_;
+  MemoryLog log_;
+  LogCategory category_{log_, "com.orvane.tonewerk", "twrs"};
+  MemoryJsonService json_;
+  MemoryPreferenceStore preferences_;
+  ManualClock clock_;
+  std::unique_ptr<ReportStore> store_;
+  StoreReader reader_;
+  int recorded_ = 0;
+  std::int64_t lastId_ = 0;
+};
+
+TEST_F(StoreReaderTest, SaysThatThereIsNoStore) {
+  EXPECT_EQ(open(), StoreReader::Outcome::kNoStore);
+  EXPECT_THAT(reader_.problem(), HasSubstr("no such file"));
+}
+
+TEST_F(StoreReaderTest, SaysThatAnEmptyFileHoldsNothingYet) {
+  { const std::ofstream empty(directory_.path("reports.db")); }
+  EXPECT_EQ(open(), StoreReader::Outcome::kNoStore);
+}
+
+TEST_F(StoreReaderTest, FailsWithAFileThatIsNoDatabase) {
+  std::ofstream(directory_.path("reports.db")) << std::string(10'000, 'x');
+  EXPECT_EQ(open(), StoreReader::Outcome::kFailed);
+  EXPECT_THAT(reader_.problem(), HasSubstr("not a database"));
+}
+
+TEST_F(StoreReaderTest, ReadsWhileTheStoreWrites) {
+  openStore();
+  record("a");
+  ASSERT_EQ(open(), StoreReader::Outcome::kDone);
+  EXPECT_THAT(payloads(), ElementsAre(R"({"n":1})"));
+  record("b");
+  EXPECT_THAT(payloads(), ElementsAre(R"({"n":1})", R"({"n":2})"));
+}
+
+TEST_F(StoreReaderTest, ReadsWithoutAWriterAndItsSideFiles) {
+  openStore();
+  record("a");
+  store_.reset();
+  ASSERT_FALSE(std::filesystem::exists(directory_.path("reports.db-wal")));
+  ASSERT_EQ(open(), StoreReader::Outcome::kDone);
+  EXPECT_THAT(payloads(), ElementsAre(R"({"n":1})"));
+}
+
+// SQLite keeps as text whatever it is given; a store may be older than the rule that nothing else comes in.
+TEST_F(StoreReaderTest, GivesTextWhateverBytesTheFileHolds) {
+  openStore();
+  store_->recordEvent(clock_.now(), "x.a", {{"processName", "lecteur-musiqu\xC3"}});
+  ASSERT_TRUE(store_->flush(std::chrono::seconds(30)));
+  ASSERT_EQ(open(), StoreReader::Outcome::kDone);
+  EXPECT_THAT(payloads(), ElementsAre("{\"processName\":\"lecteur-musiqu\uFFFD\"}"));
+}
+
+TEST_F(StoreReaderTest, LetsThroughWhatTheFilterSays) {
+  openStore();
+  for (const char* name : {"x.a", "x.b", "y.a", "y.b"}) record(name);
+  ASSERT_EQ(open(), StoreReader::Outcome::kDone);
+  EventFilter names;
+  names.name = "x.*";
+  EXPECT_THAT(payloads(names), ElementsAre(R"({"n":1})", R"({"n":2})"));
+  EventFilter times;
+  times.since = ManualClock::kStart + 20.0;
+  times.until = ManualClock::kStart + 30.0;
+  EXPECT_THAT(payloads(times), ElementsAre(R"({"n":2})", R"({"n":3})"));
+  EventFilter newest;
+  newest.name = "*.a";
+  newest.limit = 1;
+  EXPECT_THAT(payloads(newest), ElementsAre(R"({"n":3})"));
+}
+
+TEST_F(StoreReaderTest, GoesOnBehindTheLastEvent) {
+  openStore();
+  record("a");
+  ASSERT_EQ(open(), StoreReader::Outcome::kDone);
+  payloads();
+  EventFilter next;
+  next.afterId = lastId_;
+  EXPECT_THAT(payloads(next), IsEmpty());
+  record("b");
+  EXPECT_THAT(payloads(next), ElementsAre(R"({"n":2})"));
+}
+
+TEST_F(StoreReaderTest, SplitsTheTwoNamesOfARowBetweenTwoReads) {
+  openStore();
+  const ValueMap payload{{"n", 1}};
+  clock_.advance(1.0);
+  store_->recordEvent(clock_.now(), "first", payload);
+  store_->recordEvent(clock_.now(), "second", payload);
+  ASSERT_TRUE(store_->flush(std::chrono::seconds(30)));
+  ASSERT_EQ(open(), StoreReader::Outcome::kDone);
+  std::vector<StoredEvent> all;
+  ASSERT_TRUE(reader_.readEvents({}, [&](const StoredEvent& event) { all.push_back(event); }));
+  ASSERT_EQ(all.size(), 2U);
+  EventFilter next;
+  next.afterId = all[0].id;
+  std::vector<std::string> names;
+  ASSERT_TRUE(reader_.readEvents(next, [&](const StoredEvent& event) { names.push_back(event.name); }));
+  EXPECT_THAT(names, ElementsAre("second"));
+}
+
+TEST_F(StoreReaderTest, SumsDurationsOfWhateverKind) {
+  openStore();
+  record("a");
+  for (const Value& duration : {Value(2), Value(0.5), Value("1.5 s"), Value(true), Value(ValueArray{9}),
+                                Value(std::nan(""))}) {  // the last is stored as null and counts as none
+    store_->record(PowerRow{clock_.now(), 28, "x", {{"EngineOnDuration", duration}, {"ApplicationName", 7}}});
+  }
+  store_->record(PowerRow{clock_.now(), 28, "x", {{"ApplicationName", "nobody"}}});
+  ASSERT_TRUE(store_->flush(std::chrono::seconds(30)));
+  ASSERT_EQ(open(), StoreReader::Outcome::kDone);
+  std::vector<EngineOnTotal> totals;
+  ASSERT_TRUE(reader_.readEngineOnTotals({}, [&](const EngineOnTotal& total) { totals.push_back(total); }))
+      << reader_.problem();
+  ASSERT_EQ(totals.size(), 1U);
+  EXPECT_EQ(totals[0].application, "7");
+  EXPECT_EQ(totals[0].duration, 5.0);
+  EXPECT_EQ(totals[0].events, 5);
+}
+
+TEST_F(StoreReaderTest, NoticesThatTheFileHasGone) {
+  openStore();
+  record("a");
+  ASSERT_EQ(open(), StoreReader::Outcome::kDone);
+  EXPECT_FALSE(reader_.hasMoved());
+  std::filesystem::rename(directory_.path("reports.db"), directory_.path("reports.db.corrupt"));
+  EXPECT_TRUE(reader_.hasMoved());
+}
+
+}  // namespace
+}  // namespace tonewerk

@@ -1,0 +1,38 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/threads/LinuxDetachedThreads.h"
+
+#include <future>
+#include <gtest/gtest.h>
+#include <pthread.h>
+#include <string>
+#include <sys/resource.h>
+#include <thread>
+#include <unistd.h>
+
+namespace tonewerk {
+namespace {
+
+struct Seen {
+  std::thread::id thread;
+  std::string name;
+  int niceness = 0;
+};
+
+TEST(LinuxDetachedThreads, RunsWorkOnANamedThreadOfItsOwnBehindOthers) {
+  LinuxDetachedThreads threads;
+  std::promise<Seen> promise;
+  auto seen = promise.get_future();
+  ASSERT_FALSE(threads.start("twr-some-work", [promise = std::move(promise)]() mutable {
+    char name[16] = {};
+    pthread_getname_np(pthread_self(), name, sizeof(name));
+    promise.set_value(
+        {std::this_thread::get_id(), name, getpriority(PRIO_PROCESS, static_cast<id_t>(gettid()))});
+  }));
+  const Seen found = seen.get();
+  EXPECT_NE(found.thread, std::this_thread::get_id());
+  EXPECT_EQ(found.name, "twr-some-work");
+  EXPECT_GE(found.niceness, 5);
+}
+
+}  // namespace
+}  // namespace tonewerk

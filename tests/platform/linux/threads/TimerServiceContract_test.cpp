@@ -1,0 +1,176 @@
+// SPDX-License-Identifier: Apache-2.0
+#include <chrono>
+#include <condition_variable>
+#include <gtest/gtest.h>
+#include <memory>
+#include <mutex>
+#include <thread>
+#include <vector>
+
+#include "platform/linux/threads/TimerThread.h"
+#include "support/ManualTimers.h"
+
+namespace tonewerk {
+namespace {
+
+using std::chrono::milliseconds;
+
+// Time passes by itself.
+struct RealTime {
+  TimerThread timers;
+  void letPass(std::unique_lock<std::mutex>& lock, std::condition_variable& changed) {
+    changed.wait_for(lock, std::chrono::seconds(10));
+  }
+};
+
+// Time passes when the test waits.
+struct ManualTime {
+  ManualClock clock;
+  ManualTimers timers{clock};
+  void letPass(std::unique_lock<std::mutex>& lock, std::condition_variable&) {
+    lock.unlock();
+    clock.advance(milliseconds(1));
+    lock.lock();
+  }
+};
+
+// What every timer service does.
+template <typename Time>
+class TimerServiceContract : public testing::Test {
+ protected:
+  TimerService& timers() { return time_.timers; }
+
+  // Called from ticks: changes what the test waits for.
+  template <typename Change>
+  void change(Change change) {
+    {
+      const std::lock_guard lock(mutex_);
+      change();
+    }
+    changed_.notify_all();
+  }
+
+  // Waits until it is true.
+  template <typename Condition>
+  void waitUntil(Condition condition) {
+    std::unique_lock lock(mutex_);
+    while (!condition()) time_.letPass(lock, changed_);
+  }
+
+  std::mutex mutex_;
+  std::condition_variable changed_;
+  Time time_;  // last: its ticks use the above
+};
+
+using Times = testing::Types<RealTime, ManualTime>;
+TYPED_TEST_SUITE(TimerServiceContract, Times);
+
+TYPED_TEST(TimerServiceContract, RepeatsATick) {
+  int ticks = 0;
+  const auto timer = this->timers().repeat(milliseconds(1), [&] { this->change([&] { ++ticks; }); });
+  this->waitUntil([&] { return ticks >= 3; });
+  EXPECT_GE(ticks, 3);
+}
+
+TYPED_TEST(TimerServiceContract, TheShorterIntervalTicksMoreOften) {
+  int fast = 0;
+  int slow = 0;
+  int fastAtFirstSlow = 0;
+  const auto slowTimer = this->timers().repeat(milliseconds(40), [&] {
+    this->change([&] {
+      if (slow++ == 0) fastAtFirstSlow = fast;
+    });
+  });
+  const auto fastTimer = this->timers().repeat(milliseconds(2), [&] { this->change([&] { ++fast; }); });
+  this->waitUntil([&] { return slow >= 1; });
+  EXPECT_GE(fastAtFirstSlow, 1);
+}
+
+TYPED_TEST(TimerServiceContract, ATimerMayBeDestroyedInsideItsOwnTick) {
+  int ticks = 0;
+  int others = 0;
+  std::unique_ptr<Timer> timer;
+  const auto witness = this->timers().repeat(milliseconds(1), [&] { this->change([&] { ++others; }); });
+  this->change([&] {
+    timer = this->timers().repeat(milliseconds(1), [&] {
+      this->change([&] {
+        ++ticks;
+        timer.reset();
+      });
+    });
+  });
+  this->waitUntil([&] { return ticks >= 1; });
+  const int before = others;
+  this->waitUntil([&] { return others >= before + 5; });
+  EXPECT_EQ(ticks, 1);
+}
+
+TYPED_TEST(TimerServiceContract, NoTickBeginsAfterATimerWasDestroyed) {
+  int ticks = 0;
+  int others = 0;
+  auto timer = this->timers().repeat(milliseconds(1), [&] { this->change([&] { ++ticks; }); });
+  const auto witness = this->timers().repeat(milliseconds(1), [&] { this->change([&] { ++others; }); });
+  this->waitUntil([&] { return ticks >= 1; });
+  timer.reset();
+  const int before = others;
+  this->waitUntil([&] { return others >= before + 1; });  // a tick that was running has ended
+  const int ended = ticks;
+  this->waitUntil([&] { return others >= before + 6; });
+  EXPECT_EQ(ticks, ended);
+}
+
+TYPED_TEST(TimerServiceContract, ATickMayMakeAnotherTimer) {
+  int ticks = 0;
+  std::unique_ptr<Timer> second;
+  const auto first = this->timers().repeat(milliseconds(1), [&] {
+    if (second != nullptr) return;
+    second = this->timers().repeat(milliseconds(1), [&] { this->change([&] { ++ticks; }); });
+  });
+  this->waitUntil([&] { return ticks >= 2; });
+  EXPECT_GE(ticks, 2);
+}
+
+TYPED_TEST(TimerServiceContract, AllTicksRunOnOneThread) {
+  std::vector<std::thread::id> threads;
+  const auto tick = [&] { this->change([&] { threads.push_back(std::this_thread::get_id()); }); };
+  const auto first = this->timers().repeat(milliseconds(1), tick);
+  const auto second = this->timers().repeat(milliseconds(1), tick);
+  this->waitUntil([&] { return threads.size() >= 6; });
+  const std::lock_guard lock(this->mutex_);
+  for (const std::thread::id thread : threads) EXPECT_EQ(thread, threads.front());
+}
+
+TEST(TimerThreadTest, ATimerThatOutlivesItsServiceIsSilent) {
+  auto service = std::make_unique<TimerThread>();
+  const auto timer = service->repeat(std::chrono::hours(1), [] { FAIL(); });
+  service.reset();
+}
+
+TEST(ManualTimersTest, TicksRunInTheOrderOfTheirTimes) {
+  ManualClock clock;
+  ManualTimers timers(clock);
+  std::vector<std::pair<char, int>> ticks;
+  const auto record = [&](char which) {
+    return [&, which] { ticks.emplace_back(which, static_cast<int>(clock.monotonic() / milliseconds(1))); };
+  };
+  const auto a = timers.repeat(milliseconds(20), record('a'));
+  const auto b = timers.repeat(milliseconds(30), record('b'));
+  clock.advance(0.06);
+  const std::vector<std::pair<char, int>> expected = {{'a', 20}, {'b', 30}, {'a', 40}, {'a', 60}, {'b', 60}};
+  EXPECT_EQ(ticks, expected);
+  EXPECT_EQ(timers.count(), 2U);
+}
+
+TEST(ManualTimersTest, TicksThatWereMissedAreNotMadeUpFor) {
+  ManualClock clock;
+  ManualTimers timers(clock);
+  int ticks = 0;
+  const auto timer = timers.repeat(milliseconds(10), [&] {
+    if (++ticks == 1) clock.advance(milliseconds(25));  // a long tick
+  });
+  clock.advance(milliseconds(40));  // at 10, late at 35, at 40
+  EXPECT_EQ(ticks, 3);
+}
+
+}  // namespace
+}  // namespace tonewerk

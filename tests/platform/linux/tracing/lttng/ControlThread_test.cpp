@@ -1,0 +1,76 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/tracing/lttng/ControlThread.h"
+
+#include <atomic>
+#include <future>
+#include <gtest/gtest.h>
+#include <memory>
+#include <vector>
+
+namespace tonewerk {
+namespace {
+
+using namespace std::chrono_literals;
+
+TEST(ControlThreadTest, RunsPiecesInOrderAndAllOfThemBeforeItEnds) {
+  std::vector<int> ran;
+  {
+    const ControlThread thread(1h);
+    for (int i = 0; i < 100; ++i) thread.queue()->post([&ran, i] { ran.push_back(i); });
+  }
+  ASSERT_EQ(ran.size(), 100U);
+  for (int i = 0; i < 100; ++i) EXPECT_EQ(ran[static_cast<std::size_t>(i)], i);
+}
+
+TEST(ControlThreadTest, PiecesMayPostMore) {
+  bool ran = false;
+  {
+    const ControlThread thread(1h);
+    thread.queue()->post([&] { thread.queue()->post([&] { ran = true; }); });
+  }
+  EXPECT_TRUE(ran);
+}
+
+TEST(ControlThreadTest, SaysHowLongItHasBeenBusy) {
+  const ControlThread thread(1h);
+  EXPECT_EQ(thread.queue()->busyFor(), 0ms);
+  std::promise<void> begun;
+  std::promise<void> goOn;
+  thread.queue()->post([&] {
+    begun.set_value();
+    goOn.get_future().wait();
+  });
+  begun.get_future().wait();
+  while (thread.queue()->busyFor() == 0ms) std::this_thread::yield();
+  goOn.set_value();
+  while (thread.queue()->busyFor() != 0ms) std::this_thread::yield();
+}
+
+// What a frozen session daemon does to the daemon's end.
+TEST(ControlThreadTest, LeavesAPieceBehindThatDoesNotReturn) {
+  const auto goOn = std::make_shared<std::promise<void>>();
+  const auto ended = std::make_shared<std::promise<void>>();
+  {
+    const ControlThread thread(1ms);
+    thread.queue()->post([goOn, ended] {
+      goOn->get_future().wait();
+      ended->set_value();
+    });
+  }
+  goOn->set_value();
+  ended->get_future().wait();
+}
+
+TEST(ControlThreadTest, TakesNoWorkOnceItHasEnded) {
+  std::shared_ptr<ControlThread::Queue> queue;
+  {
+    const ControlThread thread(1h);
+    queue = thread.queue();
+  }
+  const auto held = std::make_shared<int>(0);
+  queue->post([held] { ADD_FAILURE(); });
+  EXPECT_EQ(held.use_count(), 1);
+}
+
+}  // namespace
+}  // namespace tonewerk
