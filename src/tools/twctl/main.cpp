@@ -3,7 +3,7 @@
 #include <unistd.h>
 
 #include "platform/linux/json/NlohmannJsonService.h"
-#include "tools/twctl/Commands.h"
+#include "tools/twctl/commands/Commands.h"
 
 int main(int argc, char** argv) {
   const tonewerk::NlohmannJsonService json;

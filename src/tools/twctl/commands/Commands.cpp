@@ -1,0 +1,61 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "tools/twctl/commands/Commands.h"
+
+#include <CLI/CLI.hpp>
+#include <exception>
+
+#include "tools/twctl/input/UsageProblem.h"
+
+namespace tonewerk {
+
+CLI::App& addCommand(CLI::App& app, Tool& tool, const std::string& name, const std::string& description) {
+  CLI::App& command = *app.add_subcommand(name, description);
+  addCommonOptions(command, tool);
+  return command;
+}
+
+void addCommonOptions(CLI::App& app, Tool& tool) {
+  app.add_flag("--json", tool.asJson, "One JSON object a line instead of a table");
+  app.add_flag("--system", tool.systemWide, "The system's daemon and directories, whoever asks");
+}
+
+int runCommandLine(int argc, const char* const* argv, Tool& tool) {
+  CLI::App app("Talks to the reporting daemon, and reads what it has stored.", "twctl");
+  app.set_version_flag("--version", std::string("twctl ") + TONEWERK_VERSION);
+  app.footer(
+      "Exit status: 0 done; 1 refused, not valid, not there, or output that cannot be written; 2 wrong\n"
+      "usage, a bad recording included; 3 no daemon answers.");
+  app.require_subcommand(1);
+  addCommonOptions(app, tool);
+  addListCommand(app, tool);
+  addValidateCommand(app, tool);
+  addSendCommand(app, tool);
+  addReplayCommand(app, tool);
+  addTopCommand(app, tool);
+  addTailCommand(app, tool);
+  addEventsCommand(app, tool);
+  addMetricsCommand(app, tool);
+  addPowerCommand(app, tool);
+  addRtcCommand(app, tool);
+  addDefaultsCommand(app, tool);
+  addNotifyCommand(app, tool);
+  addDiagnosticsCommands(app, tool);
+  addChannelsCommand(app, tool);
+  addPathsCommand(app, tool);
+  addKillCommand(app, tool);
+  try {
+    app.parse(argc, argv);
+  } catch (const CLI::ParseError& error) {
+    // Help is such an error, too.
+    const bool isAnswer = error.get_exit_code() == 0;
+    tool.status =
+        isAnswer ? app.exit(error, tool.out, tool.err) : tool.fail(kWrongUsage, usageProblem(app, error));
+  } catch (const std::exception& error) {
+    return tool.fail(kRefused, error.what());
+  }
+  // A full disk, say: half of a list must not pass for all of it.
+  if (!tool.out.flush() && tool.status == kDone) return tool.fail(kRefused, "cannot write the output");
+  return tool.status;
+}
+
+}  // namespace tonewerk

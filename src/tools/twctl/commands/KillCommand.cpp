@@ -1,0 +1,35 @@
+// SPDX-License-Identifier: Apache-2.0
+#include <CLI/CLI.hpp>
+#include <chrono>
+#include <system_error>
+
+#include "tools/twctl/Daemon.h"
+#include "tools/twctl/commands/Commands.h"
+
+namespace tonewerk {
+namespace {
+
+constexpr std::chrono::seconds kEndTimeout{30};
+
+// There is no answer: the connection ends with the daemon.
+void kill(Tool& tool) {
+  Daemon daemon(tool);
+  if (!daemon.connect(Daemon::Role::kClient)) return;
+  std::error_code error;
+  const auto answer = daemon.client().call("killService", {}, kEndTimeout, error);
+  if (answer && answer->error) {
+    tool.status = tool.fail(kRefused, Daemon::describe("killService", *answer->error));
+  } else if (error == std::errc::timed_out) {
+    tool.status = tool.fail(kNoDaemon, "the daemon has not ended");
+  }
+}
+
+}  // namespace
+
+void addKillCommand(CLI::App& app, Tool& tool) {
+  CLI::App& command =
+      addCommand(app, tool, "kill", "Ends the daemon at once; what it was given to store is stored first");
+  command.callback([&tool] { kill(tool); });
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,34 @@
+// SPDX-License-Identifier: Apache-2.0
+#include <CLI/CLI.hpp>
+
+#include "tools/twctl/Daemon.h"
+#include "tools/twctl/commands/Commands.h"
+#include "tools/twctl/commands/SessionLookup.h"
+#include "tools/twctl/show/SessionTable.h"
+
+namespace tonewerk {
+namespace {
+
+void list(Tool& tool) {
+  Daemon daemon(tool);
+  std::optional<Value> reporters;
+  if (!daemon.connect(Daemon::Role::kOnlooker) || !daemon.call("getAllReporters", {}, reporters)) return;
+  SessionTable table(tool);
+  const ValueArray* identifiers = reporters ? reporters->asArray() : nullptr;
+  if (identifiers == nullptr) return;
+  for (const Value& identifier : *identifiers) {
+    std::optional<AudioServiceType> serviceType;
+    if (!lookUpSession(daemon, identifier.integer(), serviceType)) return;
+    // One that has gone since then is left out.
+    if (serviceType) table.add(identifier.integer(), *serviceType);
+  }
+}
+
+}  // namespace
+
+void addListCommand(CLI::App& app, Tool& tool) {
+  CLI::App& command = addCommand(app, tool, "list", "The sessions of all clients");
+  command.callback([&tool] { list(tool); });
+}
+
+}  // namespace tonewerk

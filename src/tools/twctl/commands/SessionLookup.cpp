@@ -1,0 +1,19 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "tools/twctl/commands/SessionLookup.h"
+
+#include "service/TWReportingServiceProtocol.h"
+#include "tools/twctl/Daemon.h"
+
+namespace tonewerk {
+
+bool lookUpSession(Daemon& daemon, ReporterID reporterID, std::optional<AudioServiceType>& serviceType) {
+  serviceType.reset();
+  std::optional<Value> validity;
+  if (!daemon.call("reporterIDValid", {Value(reporterID)}, validity)) return false;
+  const ValueMap* session = validity ? validity->asMap() : nullptr;
+  if (session != nullptr && session->integer(TWReporterProxyKeyReporterID) == reporterID)
+    serviceType = static_cast<AudioServiceType>(session->integer(TWReporterProxyKeyServiceType));
+  return true;
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,113 @@
+// SPDX-License-Identifier: Apache-2.0
+#include <CLI/CLI.hpp>
+#include <cstdint>
+#include <limits>
+#include <memory>
+#include <optional>
+#include <ostream>
+#include <string>
+#include <vector>
+
+#include "service/WatchKeys.h"
+#include "tools/twctl/Daemon.h"
+#include "tools/twctl/commands/Commands.h"
+#include "tools/twctl/commands/LiveEvents.h"
+#include "tools/twctl/input/ValueArguments.h"
+#include "tools/twctl/show/MessagePrinter.h"
+
+namespace tonewerk {
+namespace {
+
+struct TailOptions {
+  std::vector<ReporterID> reporterIDs;
+  std::optional<std::string> category;
+  std::optional<std::string> type;
+  std::int64_t count = std::numeric_limits<std::int64_t>::max();
+};
+
+Argument listOf(const std::vector<ReporterID>& numbers) {
+  if (numbers.empty()) return std::nullopt;
+  return ValueArray(std::vector<Value>(numbers.begin(), numbers.end()));
+}
+
+// The parameters of watch.openMessages; what is wrong with the options in `problem`.
+std::optional<Arguments> filterOf(const TailOptions& options, std::string& problem) {
+  Arguments filter{listOf(options.reporterIDs), std::nullopt, std::nullopt};
+  if (options.category) {
+    const auto category = categoryOfArgument(*options.category);
+    if (!category) problem = unknownCategory(*options.category);
+    if (!category) return std::nullopt;
+    filter[1] = ValueArray{*category};
+  }
+  if (options.type) {
+    const auto type = typeOfArgument(*options.type);
+    if (!type) problem = unknownType(*options.type);
+    if (!type) return std::nullopt;
+    filter[2] = ValueArray{*type};
+  }
+  return filter;
+}
+
+// Prints an answer of watch.nextMessages, at most `left` messages of it, which it counts down.
+void print(const Tool& tool, const ValueMap& answer, std::int64_t& left) {
+  const MessagePrinter printer(tool);
+  const std::int64_t missed = answer.integer(kWatchKeyMissed);
+  if (missed > 0) printer.printMissed(static_cast<std::uint64_t>(missed));
+  const Value* list = answer.find(kWatchKeyMessages);
+  if (list != nullptr && list->asArray() != nullptr) {
+    for (const Value& message : *list->asArray()) {
+      if (left == 0) break;
+      if (message.asMap() == nullptr) continue;
+      printer.print(*message.asMap());
+      --left;
+    }
+  }
+  tool.out.flush();
+}
+
+void tail(Tool& tool, const TailOptions& options) {
+  std::string problem;
+  const std::optional<Arguments> filter = filterOf(options, problem);
+  if (!filter) {
+    tool.status = tool.fail(kWrongUsage, problem);
+    return;
+  }
+  Daemon daemon(tool);
+  if (!daemon.connect(Daemon::Role::kOnlooker)) return;
+  LiveEvents events(-1, tool.outDescriptor);
+  const auto waitReadable = [&events](int descriptor) {
+    LiveEvents::Event event{};
+    do {
+      event = events.wait(descriptor, std::nullopt);
+    } while (event == LiveEvents::Event::kResized);
+    return event == LiveEvents::Event::kReadable;
+  };
+  std::optional<DaemonFailure> failure;
+  std::optional<Value> answer = daemon.await("watch.openMessages", *filter, waitReadable, failure);
+  for (std::int64_t left = options.count; answer && left > 0 && tool.out;) {
+    answer = daemon.await("watch.nextMessages", {}, waitReadable, failure);
+    if (answer && answer->asMap() != nullptr) print(tool, *answer->asMap(), left);
+  }
+  if (failure) tool.status = tool.fail(failure->status, failure->problem);
+}
+
+}  // namespace
+
+void addTailCommand(CLI::App& app, Tool& tool) {
+  CLI::App& command = addCommand(app, tool, "tail", "Messages as they arrive, until interrupted");
+  command.footer(
+      "Who reads too slowly misses messages, and is told how many. Only for the user that the daemon runs "
+      "as,\n"
+      "and root.");
+  const auto options = std::make_shared<TailOptions>();
+  command.add_option("--id", options->reporterIDs, "Only a session's; may be given several times")
+      ->allow_extra_args(false)
+      ->check(problemWithReporterID)
+      ->take_all();
+  command.add_option("--category", options->category, "Only of it: a name, as Playback, or a number");
+  command.add_option("--type", options->type, "Only of it: a name, as Start, or a number");
+  command.add_option("--count", options->count, "Only so many")->check(problemWithCount);
+  command.callback([&tool, options] { tail(tool, *options); });
+}
+
+}  // namespace tonewerk

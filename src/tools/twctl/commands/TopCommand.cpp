@@ -1,0 +1,154 @@
+// SPDX-License-Identifier: Apache-2.0
+#include <CLI/CLI.hpp>
+#include <algorithm>
+#include <chrono>
+#include <memory>
+#include <optional>
+#include <ostream>
+#include <thread>
+#include <utility>
+
+#include "service/WatchKeys.h"
+#include "tools/twctl/Daemon.h"
+#include "tools/twctl/commands/Commands.h"
+#include "tools/twctl/commands/LiveEvents.h"
+#include "tools/twctl/commands/TopLoop.h"
+#include "tools/twctl/input/ValueArguments.h"
+#include "tools/twctl/show/SessionRates.h"
+#include "tools/twctl/show/TopFrame.h"
+
+namespace tonewerk {
+namespace {
+
+constexpr char kControlC = 3;
+
+double steadyNow() {
+  return std::chrono::duration<double>(std::chrono::steady_clock::now().time_since_epoch()).count();
+}
+
+// The terminal of a tool.
+class TerminalScreen final : public LiveScreen {
+ public:
+  explicit TerminalScreen(const Tool& tool)
+      : out_(tool.out),
+        events_(tool.inDescriptor, tool.outDescriptor),
+        terminal_(tool.out, tool.inDescriptor, tool.outDescriptor) {}
+
+  TerminalSize size() const override { return terminal_.size(); }
+  void show(const std::vector<std::string>& lines) override { terminal_.show(lines); }
+  double now() const override { return steadyNow(); }
+
+  Event waitUntil(double time) override {
+    const auto until = LiveEvents::Time(
+        std::chrono::duration_cast<LiveEvents::Time::duration>(std::chrono::duration<double>(time)));
+    for (;;) {
+      const LiveEvents::Event event = events_.wait(-1, until);
+      if (event == LiveEvents::Event::kTime) return Event::kTime;
+      if (event == LiveEvents::Event::kResized) return Event::kResized;
+      if (isEnd(event)) return Event::kQuit;
+    }
+  }
+
+  // False when somebody has seen enough before it is readable.
+  bool waitReadable(int descriptor) {
+    for (;;) {
+      const LiveEvents::Event event = events_.wait(descriptor, std::nullopt);
+      if (event == LiveEvents::Event::kReadable) return true;
+      if (isEnd(event)) return false;
+    }
+  }
+
+ private:
+  bool isEnd(LiveEvents::Event event) const {
+    if (event == LiveEvents::Event::kStopped || !out_) return true;
+    if (event != LiveEvents::Event::kKey) return false;
+    return events_.key() == 'q' || events_.key() == 'Q' || events_.key() == kControlC;
+  }
+
+  std::ostream& out_;
+  LiveEvents events_;
+  Terminal terminal_;  // restored before signals do again what they did
+};
+
+// All sessions, portion by portion; none when `ask` gave none.
+template <typename Ask>
+std::optional<std::vector<ValueMap>> listSessions(Ask ask) {
+  std::vector<ValueMap> sessions;
+  for (std::size_t total = 1; sessions.size() < total;) {
+    const std::optional<Value> answer = ask(Arguments{Value(sessions.size())});
+    if (!answer) return std::nullopt;
+    const ValueMap* portion = answer->asMap();
+    const Value* list = portion == nullptr ? nullptr : portion->find(kWatchKeySessions);
+    if (list == nullptr || list->asArray() == nullptr || list->asArray()->empty()) break;
+    for (const Value& session : *list->asArray()) {
+      if (session.asMap() != nullptr) sessions.push_back(*session.asMap());
+    }
+    total = static_cast<std::size_t>(std::max<std::int64_t>(portion->integer(kWatchKeyTotal), 0));
+  }
+  return sessions;
+}
+
+void printFrame(const Tool& tool, const std::vector<SessionRow>& rows) {
+  if (tool.asJson) {
+    for (const SessionRow& row : rows) tool.out << topObject(row).text() << '\n';
+  } else {
+    for (const std::string& line : topFrame(rows, std::nullopt)) tool.out << line << '\n';
+  }
+  tool.out.flush();
+}
+
+// A rate needs two listings.
+void printOneFrame(const Tool& tool, Daemon& daemon, double interval) {
+  const auto ask = [&daemon](const Arguments& arguments) -> std::optional<Value> {
+    std::optional<Value> result;
+    return daemon.call("watch.sessions", arguments, result) ? result : std::nullopt;
+  };
+  SessionRates rates;
+  const auto first = listSessions(ask);
+  if (!first) return;
+  rates.rowsOf(*first, steadyNow());
+  std::this_thread::sleep_for(std::chrono::duration<double>(interval));
+  const auto second = listSessions(ask);
+  if (second) printFrame(tool, rates.rowsOf(*second, steadyNow()));
+}
+
+void showOnTerminal(Tool& tool, Daemon& daemon, double interval) {
+  std::optional<DaemonFailure> failure;
+  {
+    TerminalScreen screen(tool);
+    const auto ask = [&](const Arguments& arguments) {
+      return daemon.await(
+          "watch.sessions", arguments, [&screen](int descriptor) { return screen.waitReadable(descriptor); },
+          failure);
+    };
+    runTop([&ask] { return listSessions(ask); }, screen, interval);
+  }
+  if (failure) tool.status = tool.fail(failure->status, failure->problem);
+}
+
+void top(Tool& tool, double interval) {
+  Daemon daemon(tool);
+  if (!daemon.connect(Daemon::Role::kOnlooker)) return;
+  if (tool.outIsTerminal && !tool.asJson) {
+    showOnTerminal(tool, daemon, interval);
+  } else {
+    printOneFrame(tool, daemon, interval);
+  }
+}
+
+}  // namespace
+
+void addTopCommand(CLI::App& app, Tool& tool) {
+  CLI::App& command = addCommand(app, tool, "top", "What sessions receive, as it happens, the busiest first");
+  command.footer(
+      "On a terminal until q or Ctrl-C; elsewhere, and with --json, once, after one interval. Only for the "
+      "user\n"
+      "that the daemon runs as, and root.");
+  const auto interval = std::make_shared<double>(1.0);
+  command.add_option("--interval", *interval, "Over so many seconds messages are counted (1)")
+      ->check(problemWithSeconds)
+      ->type_name("SECONDS");
+  command.callback([&tool, interval] { top(tool, *interval); });
+}
+
+}  // namespace tonewerk

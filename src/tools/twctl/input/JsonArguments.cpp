@@ -1,0 +1,62 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "tools/twctl/input/JsonArguments.h"
+
+#include <nlohmann/json.hpp>
+#include <optional>
+
+#include "platform/JsonService.h"
+
+namespace tonewerk {
+namespace {
+
+using Json = nlohmann::ordered_json;
+
+// Values are JSON without null, so arguments are taken apart here and their values read by the service, whose
+// rules are the daemon's.
+std::optional<Value> valueOf(const Json& json, const JsonService& service, std::string& problem) {
+  return service.parse(json.dump(), problem);
+}
+
+std::string takeArguments(const Json& array, const JsonService& service, Arguments& arguments) {
+  for (const Json& element : array) {
+    if (element.is_null()) {
+      arguments.emplace_back();
+      continue;
+    }
+    std::string problem;
+    std::optional<Value> value = valueOf(element, service, problem);
+    if (!value) return "parameter " + std::to_string(arguments.size() + 1) + ": " + problem;
+    arguments.emplace_back(std::move(*value));
+  }
+  return {};
+}
+
+std::string take(const Json& object, std::string_view parameters, const JsonService& service,
+                 ValueMap& members, Arguments& arguments) {
+  const auto array = object.find(std::string(parameters));
+  if (array == object.end() || !array->is_array())
+    return "\"" + std::string(parameters) + "\" must be an array";
+  for (const auto& [key, member] : object.items()) {
+    if (key == parameters) continue;
+    std::string problem;
+    std::optional<Value> value = valueOf(member, service, problem);
+    if (!value) return Value(key).text() + ": " + problem;
+    members.set(key, std::move(*value));
+  }
+  return takeArguments(*array, service, arguments);
+}
+
+}  // namespace
+
+std::string parseJsonCall(std::string_view line, std::string_view parameters, const JsonService& json,
+                          ValueMap& members, Arguments& arguments) {
+  try {
+    const Json object = Json::parse(line);
+    if (!object.is_object()) return "not a JSON object";
+    return take(object, parameters, json, members, arguments);
+  } catch (const Json::exception& exception) {
+    return exception.what();
+  }
+}
+
+}  // namespace tonewerk

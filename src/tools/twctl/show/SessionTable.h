@@ -1,0 +1,21 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include "session/AudioEvent.h"
+#include "tools/twctl/Tool.h"
+#include "tools/twctl/show/Table.h"
+
+namespace tonewerk {
+
+// Sessions as `twctl list` and `twctl validate` show them.
+class SessionTable {
+ public:
+  explicit SessionTable(const Tool& tool);
+
+  void add(ReporterID reporterID, AudioServiceType serviceType);
+
+ private:
+  Table table_;
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,185 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// twctl top and twctl tail, beside a daemon whose answers are said beforehand.
+#include <gmock/gmock.h>
+#include <memory>
+#include <sstream>
+#include <stdlib.h>
+#include <string>
+#include <vector>
+
+#include "platform/linux/json/NlohmannJsonService.h"
+#include "support/TemporaryDirectory.h"
+#include "tools/twctl/ScriptedDaemon.h"
+#include "tools/twctl/commands/Commands.h"
+
+namespace tonewerk {
+namespace {
+
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::IsEmpty;
+using testing::SizeIs;
+
+const ReplyError kRefusal = messagingError(kNotPermitted, "not permitted: this is for others");
+
+class WatchCommandsTest : public testing::Test {
+ protected:
+  WatchCommandsTest() { setenv("TONEWERK_REPORTING_SOCKET", socket.c_str(), 1); }
+  void TearDown() override { unsetenv("TONEWERK_REPORTING_SOCKET"); }
+
+  int run(std::vector<const char*> arguments) {
+    arguments.insert(arguments.begin(), "twctl");
+    out.str({});
+    err.str({});
+    Tool tool{out, err, json};
+    return runCommandLine(static_cast<int>(arguments.size()), arguments.data(), tool);
+  }
+  // Says that there are so many sessions, and of each what it does.
+  void answerSessions(std::vector<Value> sessions) {
+    const std::size_t count = sessions.size();
+    daemon.answer("watch.sessions",
+                  ValueMap{{"total", count}, {"sessions", ValueArray(std::move(sessions))}});
+  }
+  void answerMessages(std::int64_t missed, std::vector<Value> messages) {
+    daemon.answer("watch.nextMessages",
+                  ValueMap{{"missed", missed}, {"messages", ValueArray(std::move(messages))}});
+  }
+  static ValueMap message(int number) {
+    return {{"reporterID", 77},
+            {"serviceType", 2},
+            {"category", 4},
+            {"type", 1},
+            {"redundant", false},
+            {"time", 1763634000.5},
+            {"payload", ValueMap{{"number", number}}}};
+  }
+  Arguments argumentsOf(const std::string& method) {
+    for (const auto& request : daemon.requests()) {
+      if (request.method == method) return request.arguments;
+    }
+    ADD_FAILURE() << method << " was not called";
+    return {};
+  }
+
+  TemporaryDirectory directory;
+  const std::string socket = directory.path("reporting.sock");
+  ScriptedDaemon daemon{socket};
+  NlohmannJsonService json;
+  std::ostringstream out;
+  std::ostringstream err;
+};
+
+TEST_F(WatchCommandsTest, TopPrintsOneFrameWhereThereIsNoTerminal) {
+  answerSessions({ValueMap{{"reporterID", 77}, {"serviceName", "telephony"}, {"processIdentifier", 11}}});
+  EXPECT_EQ(run({"top", "--interval", "0.05"}), kDone);
+  EXPECT_EQ(out.str(),
+            "1 session, 0.0 messages a second\n"
+            "session  service    application  client  msg/s  redundant  running\n"
+            "77       telephony               ? 11    0.0    -          -\n");
+  EXPECT_THAT(daemon.requestsFor("watch.sessions"), SizeIs(2));
+}
+
+TEST_F(WatchCommandsTest, WhoWatchesSaysFirstThatItOnlyLooksOn) {
+  answerSessions({});
+  answerMessages(0, {message(1)});
+  for (const std::vector<const char*>& command :
+       {std::vector{"top", "--interval", "0.05"}, std::vector{"tail", "--count", "1"}}) {
+    const std::size_t before = daemon.requests().size();
+    EXPECT_EQ(run(command), kDone);
+    ASSERT_GT(daemon.requests().size(), before);
+    EXPECT_EQ(daemon.requests()[before].method, "observe") << command[0];
+  }
+}
+
+TEST_F(WatchCommandsTest, TopPrintsAnObjectASessionForPrograms) {
+  answerSessions({ValueMap{{"reporterID", 77}}, ValueMap{{"reporterID", 78}}});
+  EXPECT_EQ(run({"top", "--json", "--interval", "0.05"}), kDone);
+  EXPECT_EQ(out.str(),
+            "{\"reporterID\":77,\"messagesPerSecond\":0.0}\n{\"reporterID\":78,\"messagesPerSecond\":0.0}\n");
+}
+
+TEST_F(WatchCommandsTest, TopAsksForThePortionsThatAreLeft) {
+  daemon.answer("watch.sessions",
+                ValueMap{{"total", 3}, {"sessions", ValueArray{ValueMap{{"reporterID", 7}}}}});
+  EXPECT_EQ(run({"top", "--json", "--interval", "0.05"}), kDone);
+  std::vector<std::int64_t> firsts;
+  for (const auto& request : daemon.requestsFor("watch.sessions"))
+    firsts.push_back(request.arguments.at(0)->integer());
+  EXPECT_THAT(firsts, ElementsAre(0, 1, 2, 0, 1, 2));
+}
+
+TEST_F(WatchCommandsTest, TopStopsAskingWhenAPortionIsEmpty) {
+  daemon.answer("watch.sessions", ValueMap{{"total", 3}, {"sessions", ValueArray{}}});
+  EXPECT_EQ(run({"top", "--json", "--interval", "0.05"}), kDone);
+  EXPECT_THAT(daemon.requestsFor("watch.sessions"), SizeIs(2));
+}
+
+TEST_F(WatchCommandsTest, BothSayThatTheyAreNotPermitted) {
+  daemon.refuse("watch.sessions", kRefusal);
+  daemon.refuse("watch.openMessages", kRefusal);
+  for (const char* command : {"top", "tail"}) {
+    EXPECT_EQ(run({command}), kRefused);
+    EXPECT_THAT(err.str(), HasSubstr("not permitted: this is for others"));
+    EXPECT_THAT(out.str(), IsEmpty());
+  }
+}
+
+TEST_F(WatchCommandsTest, BothSayWhereNoDaemonListens) {
+  setenv("TONEWERK_REPORTING_SOCKET", "/nowhere", 1);
+  for (const char* command : {"top", "tail"}) {
+    EXPECT_EQ(run({command}), kNoDaemon);
+    EXPECT_THAT(err.str(), HasSubstr("no daemon listens on /nowhere"));
+  }
+}
+
+TEST_F(WatchCommandsTest, BothRefuseWrongUsage) {
+  for (const std::vector<const char*>& wrong :
+       std::vector<std::vector<const char*>>{{"top", "more"},
+                                             {"top", "--interval", "0"},
+                                             {"top", "--interval", "x"},
+                                             {"tail", "more"},
+                                             {"tail", "--id", "x"},
+                                             {"tail", "--count", "0"},
+                                             {"tail", "--category", "No"},
+                                             {"tail", "--type", "No"}}) {
+    EXPECT_EQ(run(wrong), kWrongUsage) << testing::PrintToString(wrong);
+    EXPECT_THAT(err.str(), testing::Not(IsEmpty()));
+  }
+  EXPECT_THAT(daemon.requests(), IsEmpty());
+}
+
+TEST_F(WatchCommandsTest, TailPrintsSoManyMessagesAndWhatWasMissedBeforeThem) {
+  answerMessages(3, {message(1), message(2)});
+  EXPECT_EQ(run({"tail", "--count", "3"}), kDone);
+  const std::string line = "2025-11-20T10:20:00.5Z  77  telephony  Playback/Start  ";
+  EXPECT_EQ(out.str(), "... missed 3 messages\n" + line + "{\"number\":1}\n" + line + "{\"number\":2}\n" +
+                           "... missed 3 messages\n" + line + "{\"number\":1}\n");
+}
+
+TEST_F(WatchCommandsTest, TailHasTheDaemonFilter) {
+  answerMessages(0, {message(1)});
+  EXPECT_EQ(run({"tail", "--id", "77", "--id", "-3", "--category", "HAL_Playback", "--type", "Start",
+                 "--count", "1"}),
+            kDone);
+  const Arguments filter = argumentsOf("watch.openMessages");
+  ASSERT_THAT(filter, SizeIs(3));
+  EXPECT_EQ(filter[0], Value(ValueArray{77, -3}));
+  EXPECT_EQ(filter[1]->asArray()->begin()->integer() & 0xFFFF, 4);
+  EXPECT_EQ(filter[2], Value(ValueArray{1}));
+}
+
+TEST_F(WatchCommandsTest, TailWantsEverythingUnlessItIsTold) {
+  answerMessages(0, {message(1)});
+  EXPECT_EQ(run({"tail", "--count", "1"}), kDone);
+  EXPECT_EQ(argumentsOf("watch.openMessages"), (Arguments{std::nullopt, std::nullopt, std::nullopt}));
+}
+
+TEST_F(WatchCommandsTest, TailSaysWhatTheDaemonRefusesLater) {
+  daemon.refuse("watch.nextMessages", messagingError(kOverLimit, "enough"));
+  EXPECT_EQ(run({"tail"}), kRefused);
+  EXPECT_EQ(err.str(), "twctl: watch.nextMessages: enough\n");
+}
+
+}  // namespace
+}  // namespace tonewerk

@@ -1,0 +1,78 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "tools/twctl/show/MessagePrinter.h"
+
+#include <gtest/gtest.h>
+#include <sstream>
+
+#include "platform/linux/json/NlohmannJsonService.h"
+#include "tools/twctl/Tool.h"
+
+namespace tonewerk {
+namespace {
+
+class MessagePrinterTest : public testing::Test {
+ protected:
+  MessagePrinterTest() { tool.asJson = false; }
+
+  // What is printed since the last time.
+  std::string printed() {
+    const std::string text = out.str();
+    out.str({});
+    return text;
+  }
+
+  ValueMap message{{"reporterID", 77},
+                   {"serviceType", 2},
+                   {"category", 4},
+                   {"type", 1},
+                   {"redundant", false},
+                   {"time", 1763634000.5},
+                   {"application", "com.example.phone"},
+                   {"payload", ValueMap{{"volume", 0.5}}}};
+  NlohmannJsonService json;
+  std::ostringstream out;
+  std::ostringstream err;
+  Tool tool{out, err, json};
+  MessagePrinter printer{tool};
+};
+
+TEST_F(MessagePrinterTest, PrintsAMessageOnALine) {
+  printer.print(message);
+  EXPECT_EQ(printed(), "2025-11-20T10:20:00.5Z  77  telephony  Playback/Start  {\"volume\":0.5}\n");
+}
+
+TEST_F(MessagePrinterTest, MarksARedundantOne) {
+  message.set("redundant", true);
+  printer.print(message);
+  EXPECT_EQ(printed(),
+            "2025-11-20T10:20:00.5Z  77  telephony  Playback/Start  (redundant)  {\"volume\":0.5}\n");
+}
+
+TEST_F(MessagePrinterTest, MakesControlCharactersHarmless) {
+  message.set("payload", ValueMap{{"a", "b\x1b[2J\xC2\x9B\n"}});
+  printer.print(message);
+  const std::string text = printed();
+  EXPECT_EQ(text.find('\x1b'), std::string::npos);
+  EXPECT_EQ(text.find('\x9B'), std::string::npos);
+  EXPECT_EQ(text.find('\n'), text.size() - 1);
+}
+
+TEST_F(MessagePrinterTest, SaysHowManyWereMissed) {
+  printer.printMissed(12);
+  printer.printMissed(1);
+  EXPECT_EQ(printed(), "... missed 12 messages\n... missed 1 message\n");
+}
+
+TEST_F(MessagePrinterTest, PrintsObjectsForPrograms) {
+  tool.asJson = true;
+  printer.print(message);
+  EXPECT_EQ(printed(), R"({"reporterID":77,"serviceType":2,"category":4,"type":1,"redundant":false,)"
+                       R"("time":1763634000.5,"application":"com.example.phone","serviceName":"telephony",)"
+                       R"("categoryName":"Playback","typeName":"Start","payload":{"volume":0.5}})"
+                       "\n");
+  printer.printMissed(12);
+  EXPECT_EQ(printed(), "{\"missed\":12}\n");
+}
+
+}  // namespace
+}  // namespace tonewerk

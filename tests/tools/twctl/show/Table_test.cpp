@@ -1,0 +1,65 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "tools/twctl/show/Table.h"
+
+#include <gtest/gtest.h>
+#include <sstream>
+#include <string>
+
+namespace tonewerk {
+namespace {
+
+TEST(TableTest, AlignsColumnsForPeople) {
+  std::ostringstream out;
+  {
+    Table table(out, false, {"id", "name"});
+    table.add({Value(5), Value("a")});
+    table.add({Value(-123), Value("Lautst\xC3\xA4rke")});
+  }
+  EXPECT_EQ(out.str(),
+            "id    name\n"
+            "5     a\n"
+            "-123  Lautst\xC3\xA4rke\n");
+}
+
+TEST(TableTest, CountsCharactersNotBytes) {
+  std::ostringstream out;
+  {
+    Table table(out, false, {"a", "b"});
+    table.add({Value("\xC3\xA4\xC3\xA4"), Value(1)});
+    table.add({Value("ab"), Value(2)});
+  }
+  EXPECT_EQ(out.str(), "a   b\n\xC3\xA4\xC3\xA4  1\nab  2\n");
+}
+
+TEST(TableTest, PrintsTheHeadOnceHoweverManyPortions) {
+  std::ostringstream out;
+  Table table(out, false, {"a", "b"});
+  table.add({Value("long"), Value(1)});
+  table.print();
+  table.add({Value("x"), Value(2)});
+  table.print();
+  EXPECT_EQ(out.str(), "a     b\nlong  1\nx     2\n");
+}
+
+TEST(TableTest, PrintsNothingWithoutRows) {
+  std::ostringstream out;
+  { const Table table(out, false, {"a"}); }
+  EXPECT_EQ(out.str(), "");
+}
+
+TEST(TableTest, GivesProgramsAnObjectALine) {
+  std::ostringstream out;
+  Table table(out, true, {"id", "text", "list"});
+  table.add({Value(1), Value("a\"\n"), Value(ValueArray{true, 2.0})});
+  EXPECT_EQ(out.str(), "{\"id\":1,\"text\":\"a\\\"\\n\",\"list\":[true,2.0]}\n");
+}
+
+TEST(TableTest, ShowsPeopleAndProgramsDifferentThingsWhereAsked) {
+  std::ostringstream out;
+  Table table(out, true, {"at"});
+  table.add({{"yesterday", "5.0"}});
+  EXPECT_EQ(out.str(), "{\"at\":5.0}\n");
+}
+
+}  // namespace
+}  // namespace tonewerk
