@@ -6,7 +6,7 @@
 #include <string>
 #include <vector>
 
-#include "bridges/pipewire/SessionSink.h"
+#include "bridges/pipewire/sessions/SessionSink.h"
 #include "values/Value.h"
 
 namespace tonewerk {

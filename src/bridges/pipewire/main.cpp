@@ -7,11 +7,11 @@
 #include <pipewire/pipewire.h>
 #include <unistd.h>
 
-#include "bridges/pipewire/DaemonLink.h"
-#include "bridges/pipewire/DriverReports.h"
-#include "bridges/pipewire/PipeWireGraph.h"
-#include "bridges/pipewire/PublishingSessionSink.h"
-#include "bridges/pipewire/StreamReports.h"
+#include "bridges/pipewire/drivers/DriverReports.h"
+#include "bridges/pipewire/drivers/PublishingSessionSink.h"
+#include "bridges/pipewire/graph/PipeWireGraph.h"
+#include "bridges/pipewire/sessions/DaemonLink.h"
+#include "bridges/pipewire/sessions/StreamReports.h"
 #include "platform/linux/threads/SystemClock.h"
 
 namespace tonewerk {

@@ -1,0 +1,24 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "bridges/pipewire/graph/CleanText.h"
+
+#include <algorithm>
+
+#include "platform/linux/files/Utf8.h"
+#include "values/ShortenedText.h"
+
+namespace tonewerk {
+
+namespace {
+
+bool isControl(char byte) { return static_cast<unsigned char>(byte) < 0x20 || byte == 0x7F; }
+
+}  // namespace
+
+std::string cleanText(std::string_view text) {
+  std::string clean = validUtf8(std::string(text));
+  clean.resize(shortened(clean, kMaxTextBytes).size());
+  std::replace_if(clean.begin(), clean.end(), isControl, '?');
+  return clean;
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,177 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "bridges/pipewire/graph/GraphModel.h"
+
+#include <charconv>
+#include <set>
+#include <utility>
+
+#include "bridges/pipewire/graph/CleanText.h"
+
+namespace tonewerk {
+
+namespace {
+
+std::optional<std::uint32_t> identifierOf(std::string_view text) {
+  std::uint32_t value = 0;
+  const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
+  if (error != std::errc() || end != text.data() + text.size()) return std::nullopt;
+  return value;
+}
+
+std::optional<DriverNode> driverOf(const Properties& node) {
+  if (!isDriver(node) || !(isSink(node) || isSource(node))) return std::nullopt;
+  const std::string_view name = propertyOf(node, kNodeNameKey);
+  return DriverNode{isSink(node) ? DriverNode::kSink : DriverNode::kSource,
+                    name.empty() ? deviceNameOf(node) : cleanText(name)};
+}
+
+void mergeInto(Properties& properties, const Properties& update) {
+  for (const auto& [key, value] : update) properties[key] = value;
+}
+
+}  // namespace
+
+void GraphModel::nodeAppeared(std::uint32_t node, const Properties& properties) {
+  mergeInto(nodes_[node].properties, properties);
+  tellAll();
+  tellDrivers(nodes_[node].properties);
+}
+
+void GraphModel::nodeDescribed(std::uint32_t node, bool running, const Properties& properties) {
+  const auto known = nodes_.find(node);
+  if (known == nodes_.end()) return;
+  mergeInto(known->second.properties, properties);
+  known->second.described = true;
+  known->second.running = running;
+  // All, because a sink's name is part of the state of whatever plays to it.
+  tellAll();
+  tellDrivers(known->second.properties);
+}
+
+void GraphModel::volumeChanged(std::uint32_t node, const StreamVolume& update) {
+  const auto known = nodes_.find(node);
+  if (known == nodes_.end()) return;
+  known->second.volume.merge(update);
+  tell(node);
+}
+
+void GraphModel::formatChanged(std::uint32_t node, const AudioFormat& format) {
+  const auto known = nodes_.find(node);
+  if (known == nodes_.end()) return;
+  known->second.format = format;
+  tell(node);
+}
+
+void GraphModel::clientDescribed(std::uint32_t client, const Properties& properties) {
+  mergeInto(clients_[client], properties);
+  tellAll();
+}
+
+void GraphModel::linkAppeared(std::uint32_t link, std::uint32_t outputNode, std::uint32_t inputNode) {
+  links_[link] = {outputNode, inputNode};
+  tell(outputNode);
+}
+
+void GraphModel::complete() {
+  isComplete_ = true;
+  tellAll();
+}
+
+void GraphModel::removed(std::uint32_t object) {
+  clients_.erase(object);
+  if (const auto link = links_.find(object); link != links_.end()) {
+    const std::uint32_t stream = link->second.outputNode;
+    links_.erase(link);
+    tell(stream);
+  }
+  const auto node = nodes_.find(object);
+  if (node == nodes_.end()) return;
+  const bool wasTold = node->second.told.has_value();
+  const Properties properties = std::move(node->second.properties);
+  nodes_.erase(node);
+  if (wasTold) observer_.streamGone(object);
+  tellAll();
+  tellDrivers(properties);
+}
+
+void GraphModel::clear() {
+  const std::map<std::uint32_t, Node> nodes = std::exchange(nodes_, {});
+  clients_.clear();
+  links_.clear();
+  isComplete_ = false;
+  for (const auto& [identifier, node] : nodes) {
+    if (node.told) observer_.streamGone(identifier);
+  }
+  onDriversChanged_();
+}
+
+std::map<std::uint32_t, DriverNode> GraphModel::drivers() const {
+  std::map<std::uint32_t, DriverNode> drivers;
+  for (const auto& [identifier, node] : nodes_) {
+    if (std::optional<DriverNode> driver = driverOf(node.properties)) {
+      drivers.emplace(identifier, *std::move(driver));
+    }
+  }
+  return drivers;
+}
+
+std::optional<DriverNode> GraphModel::driverAt(std::uint32_t node) const {
+  const auto found = nodes_.find(node);
+  return found == nodes_.end() ? std::nullopt : driverOf(found->second.properties);
+}
+
+const Properties* GraphModel::clientOf(const Node& node) const {
+  const std::optional<std::uint32_t> identifier = identifierOf(propertyOf(node.properties, kClientIDKey));
+  const auto client = identifier ? clients_.find(*identifier) : clients_.end();
+  return client == clients_.end() ? nullptr : &client->second;
+}
+
+std::string GraphModel::devicesOf(std::uint32_t stream) const {
+  std::set<std::string> names;
+  for (const auto& [identifier, link] : links_) {
+    if (link.outputNode != stream) continue;
+    const auto input = nodes_.find(link.inputNode);
+    // Whatever else listens to a stream, a recorder or a level meter, is no device.
+    if (input != nodes_.end() && isSink(input->second.properties)) {
+      names.insert(deviceNameOf(input->second.properties));
+    }
+  }
+  std::string joined;
+  for (const std::string& name : names) joined += (joined.empty() ? "" : ", ") + name;
+  return cleanText(joined);
+}
+
+StreamState GraphModel::stateOf(std::uint32_t stream, const Node& node) const {
+  static const Properties kNobody;
+  const Properties* client = clientOf(node);
+  StreamState state;
+  state.described = node.described && (client != nullptr || !node.properties.contains(kClientIDKey));
+  state.application = applicationOf(node.properties, client == nullptr ? kNobody : *client);
+  state.role = propertyOf(node.properties, kMediaRoleKey);
+  state.running = node.running;
+  state.volume = node.volume.shown();
+  state.format = node.format;
+  state.device = devicesOf(stream);
+  return state;
+}
+
+void GraphModel::tell(std::uint32_t stream) {
+  if (!isComplete_) return;
+  const auto found = nodes_.find(stream);
+  if (found == nodes_.end() || !isOutputStream(found->second.properties)) return;
+  Node& node = found->second;
+  StreamState state = stateOf(stream, node);
+  if (node.told == state) return;
+  node.told = std::move(state);
+  observer_.streamChanged(stream, *node.told);
+}
+
+void GraphModel::tellAll() {
+  for (const auto& [identifier, node] : nodes_) tell(identifier);
+}
+
+void GraphModel::tellDrivers(const Properties& node) {
+  if (driverOf(node)) onDriversChanged_();
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,190 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "bridges/pipewire/sessions/DaemonLink.h"
+
+#include <condition_variable>
+#include <mutex>
+#include <optional>
+#include <system_error>
+#include <utility>
+
+#include "client/ValuePayload.h"
+
+namespace tonewerk {
+namespace {
+
+using std::chrono::milliseconds;
+
+std::string textOf(int error) { return std::generic_category().message(error); }
+
+// Where the loop's thread waits for an answer that comes on the library's.
+class Awaited {
+ public:
+  static void answered(void* context, const twr_answer* answer) {
+    // Its own share, for who waits may have given up.
+    const std::unique_ptr<std::shared_ptr<Awaited>> share(static_cast<std::shared_ptr<Awaited>*>(context));
+    Awaited& self = **share;
+    const std::lock_guard lock(self.mutex_);
+    self.status_ = answer->status;
+    self.isAnswered_.notify_all();
+  }
+
+  bool waitForSuccess(milliseconds timeout) {
+    std::unique_lock lock(mutex_);
+    return isAnswered_.wait_for(lock, timeout, [this] { return status_.has_value(); }) && status_ == TWR_OK;
+  }
+
+ private:
+  std::mutex mutex_;
+  std::condition_variable isAnswered_;
+  std::optional<twr_status> status_;
+};
+
+}  // namespace
+
+// Who wants to know what became of a request.
+struct DaemonLink::Asked {
+  DaemonLink& link;
+  const char* method;
+};
+
+DaemonLink::DaemonLink(EventLoop& loop, const Diagnostics& diagnostics, std::string socketPath)
+    : diagnostics_(diagnostics), chosenPath_(std::move(socketPath)), inbox_(loop) {}
+
+DaemonLink::~DaemonLink() { twr_client_destroy(client_, 0); }
+
+bool DaemonLink::open(std::function<void(Connection connection)> onConnected) {
+  onConnected_ = std::move(onConnected);
+  twr_client_options options{};
+  options.size = sizeof(options);
+  options.socket_path = chosenPath_.empty() ? nullptr : chosenPath_.c_str();
+  options.state_changed = &DaemonLink::stateChanged;
+  options.context = this;
+  client_ = inbox_.isOpen() ? twr_client_create(&options) : nullptr;
+  // Not to wait, but to begin before there is anything to say.
+  const twr_status status = twr_client_connect(client_, 0);
+  return status == TWR_OK || status == TWR_NOT_CONNECTED || status == TWR_TIMED_OUT;
+}
+
+std::string DaemonLink::socketPath() const { return info().socket_path; }
+
+bool DaemonLink::finish(milliseconds timeout) {
+  // Requests are served in their order, so that any answer to this one says that all before it are done. And
+  // their answers have been read: closing a socket with unread bytes would break it for what the daemon has
+  // yet to read.
+  const auto awaited = std::make_shared<Awaited>();
+  auto share = std::make_unique<std::shared_ptr<Awaited>>(awaited);
+  if (!isConnected_ || twr_client_get_all_reporters(client_, &Awaited::answered, share.get()) != TWR_OK)
+    return false;
+  static_cast<void>(share.release());
+  return awaited->waitForSuccess(timeout);
+}
+
+void DaemonLink::create(std::int64_t reporterID) {
+  if (!wasConnected_) return;
+  if (twr_session* made = twr_session_create(client_, reporterID))
+    sessions_.insert_or_assign(reporterID, made);
+}
+
+void DaemonLink::configure(std::int64_t reporterID, std::uint16_t serviceType,
+                           const ValueMap& configuration) {
+  ValuePayload payload;
+  payload.set(configuration);
+  // The service type first: changing that of a configured session would make a new one.
+  ask("setServiceType", [&](twr_reply reply, void* context) {
+    return twr_session_set_service_type(session(reporterID), serviceType, reply, context);
+  });
+  ask("setConfiguration", [&](twr_reply reply, void* context) {
+    return twr_session_set_configuration(session(reporterID), payload.get(), reply, context);
+  });
+}
+
+void DaemonLink::start(std::int64_t reporterID) {
+  // Its answer comes with the stop. With a reply each live session would keep one waiting.
+  twr_session_start(session(reporterID), nullptr, nullptr);
+}
+
+void DaemonLink::message(std::int64_t reporterID, std::uint32_t category, std::uint16_t type,
+                         ValueMap message) {
+  if (diagnostics_.isVerbose()) {
+    diagnostics_.detail("session " + std::to_string(reporterID) + ": " + message.text());
+  }
+  ValuePayload payload;
+  payload.set(message);
+  ask("sendMessage", [&](twr_reply reply, void* context) {
+    return twr_session_send(session(reporterID), category, type, payload.get(), reply, context);
+  });
+}
+
+void DaemonLink::stop(std::int64_t reporterID) {
+  ask("stopReportingSessionForID",
+      [&](twr_reply reply, void* context) { return twr_session_stop(session(reporterID), reply, context); });
+}
+
+void DaemonLink::destroy(std::int64_t reporterID) {
+  ask("destroyReportingSession", [&](twr_reply reply, void* context) {
+    return twr_session_destroy(session(reporterID), reply, context);
+  });
+  sessions_.erase(reporterID);
+}
+
+twr_client_info DaemonLink::info() const {
+  twr_client_info info{};
+  info.size = sizeof(info);
+  twr_client_get_info(client_, &info);
+  return info;
+}
+
+twr_session* DaemonLink::session(std::int64_t reporterID) const {
+  const auto found = sessions_.find(reporterID);
+  return found == sessions_.end() ? nullptr : found->second;
+}
+
+template <class Call>
+void DaemonLink::ask(const char* method, Call call) {
+  auto asked = std::make_unique<Asked>(Asked{*this, method});
+  if (call(&DaemonLink::answered, asked.get()) == TWR_OK) static_cast<void>(asked.release());
+}
+
+// On the library's thread.
+void DaemonLink::answered(void* context, const twr_answer* answer) {
+  const std::unique_ptr<Asked> asked(static_cast<Asked*>(context));
+  if (answer->status != TWR_REFUSED) return;
+  const std::string message = answer->error_message;
+  std::string refusal = std::string(asked->method) + " refused: " + answer->error_domain + " " +
+                        std::to_string(answer->error_code);
+  if (!message.empty()) refusal += " (" + message + ")";
+  DaemonLink& link = asked->link;
+  link.inbox_.post([&link, refusal] { link.reportRefusal(refusal); });
+}
+
+// On the library's thread.
+void DaemonLink::stateChanged(void* context, twr_state state) {
+  auto& link = *static_cast<DaemonLink*>(context);
+  link.inbox_.post([&link, state] { link.changed(state, link.info().last_error); });
+}
+
+void DaemonLink::changed(twr_state state, int error) {
+  if (state == TWR_STATE_CONNECTED) return connected();
+  if (state != TWR_STATE_WAITING && state != TWR_STATE_ENDED) return;
+  if (std::exchange(isConnected_, false)) {
+    diagnostics_.say("lost the reporting daemon (" + textOf(error) + ")");
+  } else if (!std::exchange(saidAbsent_, true)) {
+    diagnostics_.say("no reporting daemon (" + textOf(error) + "), trying on");
+  }
+}
+
+void DaemonLink::connected() {
+  isConnected_ = true;
+  saidAbsent_ = false;
+  lastRefusal_.clear();
+  diagnostics_.say("connected to the reporting daemon");
+  onConnected_(std::exchange(wasConnected_, true) ? Connection::kAgain : Connection::kFirst);
+}
+
+void DaemonLink::reportRefusal(const std::string& refusal) {
+  if (refusal == lastRefusal_) return;
+  diagnostics_.say(refusal);
+  lastRefusal_ = refusal;
+}
+
+}  // namespace tonewerk

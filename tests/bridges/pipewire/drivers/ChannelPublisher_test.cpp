@@ -1,0 +1,180 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "bridges/pipewire/drivers/ChannelPublisher.h"
+
+#include <filesystem>
+#include <fstream>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+#include <sstream>
+
+#include "bridges/pipewire/drivers/PublishingSessionSink.h"
+#include "bridges/pipewire/sessions/Said.h"
+#include "support/ManualEventLoop.h"
+#include "support/TemporaryDirectory.h"
+#include "values/Value.h"
+
+namespace tonewerk {
+namespace {
+
+using std::chrono::milliseconds;
+using ::testing::ElementsAre;
+using ::testing::HasSubstr;
+
+class ChannelPublisherTest : public ::testing::Test {
+ protected:
+  static constexpr const char* kName = "bridge.json";
+
+  std::string file(const std::string& runtime) const { return runtime + "/channels/" + kName; }
+  std::string published() const { return textOf(file(directory.path())); }
+  static std::string textOf(const std::string& path) {
+    std::ifstream stream(path);
+    std::ostringstream text;
+    text << stream.rdbuf();
+    return stream ? text.str() : "no file";
+  }
+
+  const TemporaryDirectory directory;
+  Said said;
+  Diagnostics diagnostics{false, said.file()};
+  ManualClock clock;
+  ManualEventLoop loop{clock};
+  std::int64_t value = 1;
+  ChannelPublisher publisher{loop, clock, diagnostics, kName, [this] { return ValueMap{{"value", value}}; }};
+};
+
+TEST_F(ChannelPublisherTest, WritesNothingBeforeItIsOpened) {
+  publisher.changed();
+  publisher.publish();
+  clock.advance(5.0);
+  EXPECT_TRUE(std::filesystem::is_empty(directory.path()));
+}
+
+TEST_F(ChannelPublisherTest, PublishesWhenItIsOpened) {
+  publisher.open(directory.path());
+  EXPECT_EQ(published(), "{\"value\":1}\n");
+  EXPECT_EQ(said.text(), "");
+}
+
+TEST_F(ChannelPublisherTest, ReplacesWhatADeadProcessLeftBehind) {
+  std::filesystem::create_directory(directory.path("channels"));
+  std::ofstream(file(directory.path())) << "{\"value\": 77, \"half";
+  std::ofstream(file(directory.path()) + ".new") << "rest";
+  publisher.open(directory.path());
+  EXPECT_EQ(published(), "{\"value\":1}\n");
+  EXPECT_FALSE(std::filesystem::exists(file(directory.path()) + ".new"));
+}
+
+TEST_F(ChannelPublisherTest, WritesChangesOnceInASecond) {
+  publisher.open(directory.path());
+  clock.advance(milliseconds(400));
+  value = 2;
+  publisher.changed();
+  value = 3;
+  publisher.changed();
+  clock.advance(milliseconds(599));
+  EXPECT_EQ(published(), "{\"value\":1}\n");
+  clock.advance(milliseconds(1));
+  EXPECT_EQ(published(), "{\"value\":3}\n");
+
+  clock.advance(milliseconds(1000));
+  value = 4;
+  publisher.changed();
+  EXPECT_EQ(published(), "{\"value\":4}\n");
+}
+
+TEST_F(ChannelPublisherTest, LeavesTheFileAloneWhenNothingChanged) {
+  publisher.open(directory.path());
+  std::filesystem::remove(file(directory.path()));
+  clock.advance(2.0);
+  publisher.changed();
+  EXPECT_EQ(published(), "no file");
+  value = 2;
+  publisher.changed();
+  clock.advance(1.0);
+  EXPECT_EQ(published(), "{\"value\":2}\n");
+}
+
+// A service's runtime directory goes with the service.
+TEST_F(ChannelPublisherTest, WritesAgainForADaemonThatIsBackWithAnEmptyDirectory) {
+  publisher.open(directory.path());
+  std::filesystem::remove_all(directory.path("channels"));
+  publisher.open(directory.path());
+  EXPECT_EQ(published(), "{\"value\":1}\n");
+}
+
+TEST_F(ChannelPublisherTest, FollowsADaemonToAnotherDirectory) {
+  const std::string other = directory.path("other");
+  std::filesystem::create_directory(other);
+  publisher.open(directory.path());
+  publisher.open(other);
+  EXPECT_EQ(published(), "no file");
+  EXPECT_EQ(textOf(file(other)), "{\"value\":1}\n");
+}
+
+TEST_F(ChannelPublisherTest, RemovesTheFileAtTheEndAndWritesNoMore) {
+  publisher.open(directory.path());
+  value = 2;
+  publisher.changed();
+  publisher.withdraw();
+  EXPECT_EQ(published(), "no file");
+  clock.advance(5.0);
+  publisher.changed();
+  publisher.publish();
+  EXPECT_EQ(published(), "no file");
+}
+
+TEST_F(ChannelPublisherTest, SaysOnceThatItCannotWriteAndTriesOn) {
+  const std::string runtime = directory.path("later");
+  publisher.open(runtime);
+  value = 2;
+  publisher.publish();
+  EXPECT_EQ(countOf(said.text(), "cannot publish driver channels in " + runtime + "/channels"), 1);
+  EXPECT_THAT(said.text(), HasSubstr("No such file or directory"));
+  std::filesystem::create_directory(runtime);
+  publisher.publish();
+  EXPECT_EQ(textOf(file(runtime)), "{\"value\":2}\n");
+
+  std::filesystem::remove_all(runtime);
+  value = 3;
+  publisher.publish();
+  EXPECT_EQ(countOf(said.text(), "cannot publish"), 2);
+}
+
+// Notes what a reader of the file sees at each call.
+class ReadingSink final : public SessionSink {
+ public:
+  explicit ReadingSink(std::function<std::string()> read) : read_(std::move(read)) {}
+  void create(std::int64_t) override { note("create"); }
+  void configure(std::int64_t, std::uint16_t, const ValueMap&) override { note("configure"); }
+  void start(std::int64_t) override { note("start"); }
+  void message(std::int64_t, std::uint32_t, std::uint16_t, ValueMap) override { note("message"); }
+  void stop(std::int64_t) override { note("stop"); }
+  void destroy(std::int64_t) override { note("destroy"); }
+
+  std::vector<std::string> notes;
+
+ private:
+  void note(const char* call) { notes.push_back(call + (" " + read_())); }
+  std::function<std::string()> read_;
+};
+
+TEST_F(ChannelPublisherTest, IsUpToDateBeforeASessionBeginsAndBeforeItEnds) {
+  ReadingSink reader([this] { return published(); });
+  PublishingSessionSink sink(reader, publisher);
+  publisher.open(directory.path());
+  value = 2;
+  sink.create(9);
+  sink.configure(9, 7, {});
+  sink.start(9);
+  value = 3;
+  sink.message(9, 5, 0, {});
+  sink.stop(9);
+  value = 4;
+  sink.destroy(9);
+  EXPECT_THAT(reader.notes,
+              ElementsAre("create {\"value\":2}\n", "configure {\"value\":2}\n", "start {\"value\":2}\n",
+                          "message {\"value\":2}\n", "stop {\"value\":3}\n", "destroy {\"value\":3}\n"));
+}
+
+}  // namespace
+}  // namespace tonewerk

@@ -1,0 +1,181 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "bridges/pipewire/drivers/DriverReports.h"
+
+#include <filesystem>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include "support/ManualEventLoop.h"
+#include "support/MemorySessionSink.h"
+#include "support/TemporaryDirectory.h"
+#include "values/Value.h"
+
+namespace tonewerk {
+namespace {
+
+using std::chrono::milliseconds;
+using ::testing::IsEmpty;
+using ::testing::SizeIs;
+
+// A sink that drives two streams, each with a session.
+class DriverReportsTest : public ::testing::Test {
+ protected:
+  static constexpr std::uint32_t kSpeaker = 36;
+  static constexpr std::uint32_t kFirst = 42;
+  static constexpr std::uint32_t kSecond = 43;
+
+  void SetUp() override {
+    model.complete();
+    addDriver(kSpeaker, "Audio/Sink", "speaker");
+    for (const std::uint32_t stream : {kFirst, kSecond}) {
+      model.nodeAppeared(stream, {{std::string(kMediaClassKey), "Stream/Output/Audio"}});
+      model.nodeDescribed(stream, true, {});
+    }
+    ASSERT_THAT(sink.sessions, SizeIs(2));
+    clock.advance(10.0);
+    run();
+  }
+  void addDriver(std::uint32_t node, const char* mediaClass, const char* name) {
+    model.nodeAppeared(node, {{std::string(kMediaClassKey), mediaClass}, {std::string(kNodeNameKey), name}});
+    model.nodeDescribed(node, true, {{std::string(kNodeDriverKey), "true"}});
+  }
+
+  // A cycle in which nobody is late, 100 ms ago.
+  ProfiledCycle cycle() {
+    ProfiledCycle cycle;
+    cycle.driver = kSpeaker;
+    cycle.number = ++number;
+    cycle.position = number * 1024;
+    cycle.frames = 1024;
+    cycle.period = milliseconds(21);
+    cycle.begin = clock.monotonic() - milliseconds(100);
+    cycle.processing = milliseconds(1);
+    cycle.xruns = driverXruns;
+    cycle.followers = {{kFirst, true, {}}, {kSecond, true, {}}};
+    return cycle;
+  }
+  ProfiledCycle cycleWithoutTheFirst() {
+    ProfiledCycle late = cycle();
+    late.followers[0].hasFinished = false;
+    return late;
+  }
+  void run() { drivers.profiled({cycle()}); }
+
+  // The overloads that a stream's session heard of.
+  std::vector<ValueMap> overloads(std::size_t session) const {
+    std::vector<ValueMap> found;
+    for (const MemorySessionSink::Message& message : sink.sessions.at(session).messages) {
+      if (message.category == 7 && message.type == 6) found.push_back(message.payload);
+    }
+    return found;
+  }
+  std::int64_t cyclesOf(const std::string& subgroup) const {
+    const ValueMap content = statistics.channelsOf("graph");
+    for (const Value& channel : *content.find("channels")->asArray()) {
+      const ValueMap& map = *channel.asMap();
+      if (map.text("name") == "Cycles" && map.contains("subgroup") && map.text("subgroup") == subgroup) {
+        return map.integer("value");
+      }
+    }
+    return -1;
+  }
+
+  const TemporaryDirectory directory;
+  ManualClock clock;
+  ManualEventLoop loop{clock};
+  Diagnostics diagnostics{false};
+  MemorySessionSink sink;
+  ReporterIdentifiers identifiers{clock, 1};
+  DriverStatistics statistics;
+  ChannelPublisher publisher{loop, clock, diagnostics, "graph.json",
+                             [this] { return statistics.channelsOf("graph"); }};
+  StreamReports streams{sink, clock, identifiers, loop};
+  GraphModel model{streams};
+  DriverReports drivers{model, statistics, streams, publisher, clock};
+  std::uint64_t number = 0;
+  std::uint32_t driverXruns = 0;
+};
+
+TEST_F(DriverReportsTest, TellsAStreamThatIsLateAndNoOther) {
+  drivers.profiled({cycleWithoutTheFirst()});
+  ASSERT_THAT(overloads(0), SizeIs(1));
+  const ValueMap overload = overloads(0)[0];
+  EXPECT_EQ(overload.text("issue_type"), "overload");
+  EXPECT_EQ(overload.integer("smallest_buffer_frame_size"), 1024);
+  EXPECT_EQ(overload.integer("io_cycle"), 2);
+  EXPECT_EQ(overload.integer("xrun_count"), 1);
+  EXPECT_NEAR(overload.number("twreporting_timestamp"), clock.now() - 0.1, 0.001);
+  EXPECT_THAT(overloads(1), IsEmpty());
+}
+
+TEST_F(DriverReportsTest, TellsEveryStreamThatADriverServesOfItsXruns) {
+  driverXruns = 2;
+  run();
+  ASSERT_THAT(overloads(0), SizeIs(1));
+  ASSERT_THAT(overloads(1), SizeIs(1));
+  EXPECT_EQ(overloads(1)[0].integer("xrun_count"), 2);
+}
+
+TEST_F(DriverReportsTest, TellsWhatHappenedInOneProfileAtOnce) {
+  drivers.profiled({cycleWithoutTheFirst(), cycle(), cycleWithoutTheFirst()});
+  ASSERT_THAT(overloads(0), SizeIs(1));
+  EXPECT_EQ(overloads(0)[0].integer("xrun_count"), 2);
+  EXPECT_EQ(overloads(0)[0].integer("io_cycle"), 4);
+}
+
+TEST_F(DriverReportsTest, SaysNothingWhenNobodyIsLate) {
+  run();
+  run();
+  EXPECT_THAT(overloads(0), IsEmpty());
+}
+
+TEST_F(DriverReportsTest, TakesATimeThatCannotBeForNow) {
+  ProfiledCycle future = cycleWithoutTheFirst();
+  future.begin = clock.monotonic() + milliseconds(1);
+  drivers.profiled({future});
+  EXPECT_EQ(overloads(0).at(0).number("twreporting_timestamp"), clock.now());
+  clock.advance(60.0);
+  ProfiledCycle ancient = cycleWithoutTheFirst();
+  ancient.begin = milliseconds(1);
+  drivers.profiled({ancient});
+  EXPECT_EQ(overloads(0).at(1).number("twreporting_timestamp"), clock.now());
+}
+
+TEST_F(DriverReportsTest, CountsTheCyclesOfDriversThatAreSinksOrSources) {
+  addDriver(50, "Audio/Source", "microphone");
+  EXPECT_EQ(cyclesOf("speaker"), 1);
+  EXPECT_EQ(cyclesOf("microphone"), 0);
+  ProfiledCycle other = cycle();
+  other.driver = 50;
+  ProfiledCycle unknown = cycle();
+  unknown.driver = 77;
+  drivers.profiled({other, unknown, cycle()});
+  EXPECT_EQ(cyclesOf("microphone"), 1);
+  EXPECT_EQ(cyclesOf("speaker"), 2);
+}
+
+TEST_F(DriverReportsTest, PublishesWhatIsNew) {
+  publisher.open(directory.path());
+  const std::string file = directory.path("channels/graph.json");
+  const std::uintmax_t before = std::filesystem::file_size(file);
+  addDriver(50, "Audio/Source", "microphone");
+  clock.advance(1.0);
+  EXPECT_GT(std::filesystem::file_size(file), before);
+
+  std::filesystem::remove(file);
+  run();
+  clock.advance(1.0);
+  EXPECT_TRUE(std::filesystem::exists(file));
+}
+
+// The graph numbers its nodes anew after a restart.
+TEST_F(DriverReportsTest, TakesANewDriversCountForNoXruns) {
+  driverXruns = 3;
+  model.removed(kSpeaker);
+  addDriver(kSpeaker, "Audio/Sink", "headset");
+  run();
+  EXPECT_THAT(overloads(0), IsEmpty());
+}
+
+}  // namespace
+}  // namespace tonewerk
