@@ -27,11 +27,11 @@
 #include "session/TWReportingContext.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionMessage.h"
-#include "support/MemoryDiagwire.h"
-#include "support/MemoryEnergybook.h"
-#include "support/MemoryLinkReport.h"
-#include "support/MemoryMetricon.h"
 #include "support/TemporaryDirectory.h"
+#include "support/memory/MemoryDiagwire.h"
+#include "support/memory/MemoryEnergybook.h"
+#include "support/memory/MemoryLinkReport.h"
+#include "support/memory/MemoryMetricon.h"
 #include "workers/TWReportingWorkerClasses.h"
 
 namespace tonewerk {

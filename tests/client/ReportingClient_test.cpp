@@ -19,8 +19,8 @@
 #include "platform/linux/protobuf/Hex.h"
 #include "platform/linux/socket/UnixAddress.h"
 #include "platform/linux/socket/UnixSocketListener.h"
-#include "support/MemoryLog.h"
 #include "support/TemporaryDirectory.h"
+#include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
 namespace {

@@ -8,7 +8,7 @@
 #include <vector>
 
 #include "platform/LogCategory.h"
-#include "support/MemoryLog.h"
+#include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
 namespace {

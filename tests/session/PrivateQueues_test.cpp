@@ -5,7 +5,7 @@
 #include <optional>
 #include <string>
 
-#include "support/ManualSerialQueue.h"
+#include "support/manual/ManualSerialQueue.h"
 
 namespace tonewerk {
 namespace {

@@ -6,7 +6,7 @@
 #include <string>
 #include <thread>
 
-#include "support/ManualSerialQueue.h"
+#include "support/manual/ManualSerialQueue.h"
 
 namespace tonewerk {
 namespace {

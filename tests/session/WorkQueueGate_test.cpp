@@ -6,8 +6,8 @@
 #include <memory>
 #include <thread>
 
-#include "support/ManualSerialQueue.h"
 #include "support/ReportingTest.h"
+#include "support/manual/ManualSerialQueue.h"
 
 namespace tonewerk {
 namespace {

@@ -9,8 +9,8 @@
 
 #include "service/TWReportingClientServerInstance.h"
 #include "service/TWReportingService.h"
-#include "support/MemoryMessaging.h"
 #include "support/ReportingTest.h"
+#include "support/memory/MemoryMessaging.h"
 
 namespace tonewerk {
 

@@ -6,7 +6,7 @@
 #include <sqlite3.h>
 #include <string>
 
-#include "support/SmallFileSystem.h"
+#include "support/memory/SmallFileSystem.h"
 #include "system/support/DaemonTest.h"
 #include "system/support/RecordedEvents.h"
 

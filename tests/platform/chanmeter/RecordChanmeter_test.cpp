@@ -5,7 +5,7 @@
 #include <gtest/gtest.h>
 
 #include "support/ChannelRecords.h"
-#include "support/MemoryChanmeter.h"
+#include "support/memory/MemoryChanmeter.h"
 
 namespace tonewerk {
 namespace {

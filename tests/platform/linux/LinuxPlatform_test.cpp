@@ -13,11 +13,11 @@
 #include "platform/linux/diagnostics/DiagnosticsStore.h"
 #include "platform/linux/files/Directories.h"
 #include "platform/linux/tracing/UnavailableTracing.h"
-#include "support/MemoryDiagwire.h"
-#include "support/MemoryEnergybook.h"
-#include "support/MemoryLinkReport.h"
-#include "support/MemoryMetricon.h"
 #include "support/TemporaryDirectory.h"
+#include "support/memory/MemoryDiagwire.h"
+#include "support/memory/MemoryEnergybook.h"
+#include "support/memory/MemoryLinkReport.h"
+#include "support/memory/MemoryMetricon.h"
 
 namespace tonewerk {
 namespace {

@@ -14,10 +14,10 @@
 #include "platform/linux/json/NlohmannJsonService.h"
 #include "platform/linux/socket/UnixAddress.h"
 #include "platform/linux/store/ReportStore.h"
-#include "support/ManualClock.h"
-#include "support/MemoryLog.h"
-#include "support/MemoryPreferenceStore.h"
 #include "support/TemporaryDirectory.h"
+#include "support/manual/ManualClock.h"
+#include "support/memory/MemoryLog.h"
+#include "support/memory/MemoryPreferenceStore.h"
 #include "tools/twctl/CommandLineTest.h"
 
 namespace tonewerk {

@@ -17,7 +17,7 @@
 #include "platform/linux/socket/ServerSocket.h"
 #include "platform/linux/socket/UnixSocketListener.h"
 #include "service/TWReportingServiceExport.h"
-#include "support/MemoryLog.h"
+#include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
 

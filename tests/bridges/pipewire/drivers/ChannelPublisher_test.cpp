@@ -9,8 +9,8 @@
 
 #include "bridges/pipewire/drivers/PublishingSessionSink.h"
 #include "bridges/pipewire/sessions/Said.h"
-#include "support/ManualEventLoop.h"
 #include "support/TemporaryDirectory.h"
+#include "support/manual/ManualEventLoop.h"
 #include "values/Value.h"
 
 namespace tonewerk {

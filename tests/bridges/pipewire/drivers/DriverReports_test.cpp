@@ -5,9 +5,9 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include "support/ManualEventLoop.h"
-#include "support/MemorySessionSink.h"
 #include "support/TemporaryDirectory.h"
+#include "support/manual/ManualEventLoop.h"
+#include "support/memory/MemorySessionSink.h"
 #include "values/Value.h"
 
 namespace tonewerk {

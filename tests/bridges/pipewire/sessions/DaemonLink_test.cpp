@@ -10,9 +10,9 @@
 #include "bridges/pipewire/sessions/Said.h"
 #include "bridges/pipewire/sessions/StreamReports.h"
 #include "platform/linux/socket/UnixAddress.h"
-#include "support/ManualClock.h"
-#include "support/ManualEventLoop.h"
 #include "support/TemporaryDirectory.h"
+#include "support/manual/ManualClock.h"
+#include "support/manual/ManualEventLoop.h"
 
 namespace tonewerk {
 namespace {

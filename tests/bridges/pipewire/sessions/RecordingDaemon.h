@@ -14,7 +14,7 @@
 #include "platform/LogCategory.h"
 #include "platform/linux/socket/UnixSocketListener.h"
 #include "service/TWReportingServiceExport.h"
-#include "support/MemoryLog.h"
+#include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
 

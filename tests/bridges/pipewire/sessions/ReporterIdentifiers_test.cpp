@@ -4,7 +4,7 @@
 #include <gtest/gtest.h>
 #include <set>
 
-#include "support/ManualClock.h"
+#include "support/manual/ManualClock.h"
 
 namespace tonewerk {
 namespace {

@@ -7,9 +7,9 @@
 #include <utility>
 
 #include "bridges/pipewire/sessions/StreamReports.h"
-#include "support/ManualClock.h"
-#include "support/ManualEventLoop.h"
-#include "support/MemorySessionSink.h"
+#include "support/manual/ManualClock.h"
+#include "support/manual/ManualEventLoop.h"
+#include "support/memory/MemorySessionSink.h"
 
 namespace tonewerk {
 namespace {

@@ -8,9 +8,9 @@
 
 #include "platform/linux/channels/LinuxChanmeter.h"
 #include "support/ChannelRecords.h"
-#include "support/MemoryChanmeter.h"
-#include "support/MemoryLog.h"
 #include "support/TemporaryDirectory.h"
+#include "support/memory/MemoryChanmeter.h"
+#include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
 namespace {

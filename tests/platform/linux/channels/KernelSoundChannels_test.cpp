@@ -9,7 +9,7 @@
 #include "platform/linux/channels/ChannelFailures.h"
 #include "platform/linux/channels/SoundTree.h"
 #include "support/ChannelRecords.h"
-#include "support/MemoryLog.h"
+#include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
 namespace {

@@ -11,8 +11,8 @@
 
 #include "platform/linux/channels/ChannelFailures.h"
 #include "platform/linux/channels/SoundTree.h"
-#include "support/MemoryLog.h"
 #include "support/TemporaryDirectory.h"
+#include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
 namespace {

@@ -16,8 +16,8 @@
 #include "platform/linux/channels/ChannelFailures.h"
 #include "platform/linux/files/FileDescriptor.h"
 #include "support/ChannelRecords.h"
-#include "support/MemoryLog.h"
 #include "support/TemporaryDirectory.h"
+#include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
 namespace {

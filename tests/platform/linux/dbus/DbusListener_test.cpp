@@ -19,7 +19,7 @@
 #include "platform/linux/dbus/PrivateBus.h"
 #include "platform/linux/messagepack/RpcLimits.h"
 #include "platform/linux/messaging/MessagingRig.h"
-#include "support/MemoryLog.h"
+#include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
 namespace {

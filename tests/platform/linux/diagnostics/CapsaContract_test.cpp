@@ -9,13 +9,13 @@
 #include "platform/linux/diagnostics/DiagnosticsStore.h"
 #include "platform/linux/diagnostics/LinuxCapsa.h"
 #include "platform/linux/threads/ThreadQueueFactory.h"
-#include "support/ManualClock.h"
-#include "support/ManualTimers.h"
-#include "support/MemoryCapsa.h"
-#include "support/MemoryJsonService.h"
-#include "support/MemoryLog.h"
-#include "support/MemoryPreferenceStore.h"
 #include "support/TemporaryDirectory.h"
+#include "support/manual/ManualClock.h"
+#include "support/manual/ManualTimers.h"
+#include "support/memory/MemoryCapsa.h"
+#include "support/memory/MemoryJsonService.h"
+#include "support/memory/MemoryLog.h"
+#include "support/memory/MemoryPreferenceStore.h"
 
 namespace tonewerk {
 namespace {

@@ -5,7 +5,7 @@
 #include <limits>
 #include <string>
 
-#include "support/ManualClock.h"
+#include "support/manual/ManualClock.h"
 
 namespace tonewerk {
 namespace {

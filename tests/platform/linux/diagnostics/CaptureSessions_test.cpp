@@ -7,8 +7,8 @@
 
 #include "platform/linux/threads/SystemClock.h"
 #include "platform/linux/threads/TimerThread.h"
-#include "support/ManualClock.h"
-#include "support/ManualTimers.h"
+#include "support/manual/ManualClock.h"
+#include "support/manual/ManualTimers.h"
 
 namespace tonewerk {
 namespace {

@@ -13,11 +13,11 @@
 
 #include "platform/LogCategory.h"
 #include "platform/linux/json/NlohmannJsonService.h"
-#include "support/ManualClock.h"
-#include "support/MemoryLog.h"
-#include "support/MemoryPreferenceStore.h"
-#include "support/SmallFileSystem.h"
 #include "support/TemporaryDirectory.h"
+#include "support/manual/ManualClock.h"
+#include "support/memory/MemoryLog.h"
+#include "support/memory/MemoryPreferenceStore.h"
+#include "support/memory/SmallFileSystem.h"
 
 namespace tonewerk {
 namespace {

@@ -16,10 +16,10 @@
 #include "platform/linux/json/NlohmannJsonService.h"
 #include "platform/linux/preferences/TomlPreferenceStore.h"
 #include "platform/linux/threads/ThreadQueueFactory.h"
-#include "support/ManualClock.h"
-#include "support/ManualTimers.h"
-#include "support/MemoryLog.h"
 #include "support/TemporaryDirectory.h"
+#include "support/manual/ManualClock.h"
+#include "support/manual/ManualTimers.h"
+#include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
 namespace {

@@ -11,10 +11,10 @@
 #include "platform/linux/diagnostics/LinuxWhirlcapRequest.h"
 #include "platform/linux/json/NlohmannJsonService.h"
 #include "platform/linux/threads/ThreadQueueFactory.h"
-#include "support/ManualClock.h"
-#include "support/MemoryLog.h"
-#include "support/MemoryPreferenceStore.h"
 #include "support/TemporaryDirectory.h"
+#include "support/manual/ManualClock.h"
+#include "support/memory/MemoryLog.h"
+#include "support/memory/MemoryPreferenceStore.h"
 
 namespace tonewerk {
 namespace {

@@ -18,9 +18,9 @@
 #include "platform/linux/files/FileDescriptor.h"
 #include "platform/linux/files/LinuxFileSystem.h"
 #include "support/InterceptedCalls.h"
-#include "support/MemoryFileSystem.h"
-#include "support/SmallFileSystem.h"
 #include "support/TemporaryDirectory.h"
+#include "support/memory/MemoryFileSystem.h"
+#include "support/memory/SmallFileSystem.h"
 
 namespace tonewerk {
 namespace {

@@ -9,8 +9,8 @@
 #include <nlohmann/json.hpp>
 #include <sys/resource.h>
 
-#include "support/ManualClock.h"
 #include "support/TemporaryDirectory.h"
+#include "support/manual/ManualClock.h"
 
 namespace tonewerk {
 namespace {

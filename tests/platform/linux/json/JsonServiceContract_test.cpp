@@ -4,8 +4,8 @@
 #include <rapidcheck/gtest.h>
 
 #include "platform/linux/json/NlohmannJsonService.h"
-#include "support/MemoryJsonService.h"
 #include "support/ValueGenerators.h"
+#include "support/memory/MemoryJsonService.h"
 
 namespace tonewerk {
 namespace {

@@ -8,7 +8,7 @@
 #include <unistd.h>
 
 #include "platform/linux/log/StandardLog.h"
-#include "support/ManualClock.h"
+#include "support/manual/ManualClock.h"
 
 namespace tonewerk {
 namespace {

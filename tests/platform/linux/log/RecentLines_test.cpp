@@ -5,8 +5,8 @@
 
 #include "platform/linux/diagnostics/collectors/LogTailCollector.h"
 #include "platform/linux/log/RememberingLog.h"
-#include "support/ManualClock.h"
-#include "support/MemoryLog.h"
+#include "support/manual/ManualClock.h"
+#include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
 namespace {

@@ -11,7 +11,7 @@
 
 #include "platform/LogLine.h"
 #include "platform/linux/files/FileDescriptor.h"
-#include "support/ManualClock.h"
+#include "support/manual/ManualClock.h"
 
 namespace tonewerk {
 namespace {

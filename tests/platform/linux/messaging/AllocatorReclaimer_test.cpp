@@ -5,8 +5,8 @@
 #include <gmock/gmock.h>
 #include <vector>
 
-#include "support/ManualClock.h"
-#include "support/ManualTimers.h"
+#include "support/manual/ManualClock.h"
+#include "support/manual/ManualTimers.h"
 
 namespace tonewerk {
 namespace {

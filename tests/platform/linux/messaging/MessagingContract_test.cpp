@@ -14,12 +14,12 @@
 #include "platform/linux/messaging/AllocatorReclaimer.h"
 #include "platform/linux/messaging/MessagingRig.h"
 #include "platform/linux/socket/UnixSocketListener.h"
-#include "support/ManualClock.h"
-#include "support/ManualTimers.h"
-#include "support/MemoryLog.h"
-#include "support/MemoryMessaging.h"
 #include "support/TemporaryDirectory.h"
 #include "support/client/ReportingClient.h"
+#include "support/manual/ManualClock.h"
+#include "support/manual/ManualTimers.h"
+#include "support/memory/MemoryLog.h"
+#include "support/memory/MemoryMessaging.h"
 
 namespace tonewerk {
 namespace {

@@ -14,9 +14,9 @@
 #include <unistd.h>
 #include <vector>
 
-#include "support/MemoryLog.h"
 #include "support/Stranger.h"
 #include "support/TemporaryDirectory.h"
+#include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
 namespace {

@@ -10,8 +10,8 @@
 #include <string>
 
 #include "platform/linux/threads/ThreadQueue.h"
-#include "support/MemoryLog.h"
 #include "support/TemporaryDirectory.h"
+#include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
 namespace {

@@ -11,9 +11,9 @@
 #include "platform/linux/notifications/InotifyNotificationService.h"
 #include "platform/linux/notifications/NotificationFiles.h"
 #include "platform/linux/threads/ThreadQueue.h"
-#include "support/MemoryLog.h"
-#include "support/MemoryNotificationService.h"
 #include "support/TemporaryDirectory.h"
+#include "support/memory/MemoryLog.h"
+#include "support/memory/MemoryNotificationService.h"
 
 namespace tonewerk {
 namespace {

@@ -6,12 +6,12 @@
 #include "platform/LogCategory.h"
 #include "platform/linux/otlp/CurlHttpClient.h"
 #include "platform/linux/store/ReportStore.h"
-#include "support/ManualClock.h"
-#include "support/MemoryJsonService.h"
-#include "support/MemoryLog.h"
-#include "support/MemoryPreferenceStore.h"
 #include "support/OtlpReceiver.h"
 #include "support/TemporaryDirectory.h"
+#include "support/manual/ManualClock.h"
+#include "support/memory/MemoryJsonService.h"
+#include "support/memory/MemoryLog.h"
+#include "support/memory/MemoryPreferenceStore.h"
 
 namespace tonewerk {
 namespace {

@@ -6,8 +6,8 @@
 #include "platform/LogCategory.h"
 #include "platform/linux/otlp/CurlHttpClient.h"
 #include "platform/linux/threads/SystemClock.h"
-#include "support/MemoryLog.h"
 #include "support/OtlpReceiver.h"
+#include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
 namespace {

@@ -5,9 +5,9 @@
 #include <zlib.h>
 
 #include "platform/LogCategory.h"
-#include "support/ManualClock.h"
-#include "support/MemoryLog.h"
-#include "support/ScriptedHttpClient.h"
+#include "support/manual/ManualClock.h"
+#include "support/memory/MemoryLog.h"
+#include "support/memory/ScriptedHttpClient.h"
 
 namespace tonewerk {
 namespace {

@@ -4,9 +4,9 @@
 #include <memory>
 
 #include "platform/linux/preferences/TomlDeviceFacts.h"
-#include "support/MemoryDeviceFacts.h"
-#include "support/MemoryLog.h"
 #include "support/TemporaryDirectory.h"
+#include "support/memory/MemoryDeviceFacts.h"
+#include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
 namespace {

@@ -6,9 +6,9 @@
 
 #include "platform/linux/preferences/TomlPreferenceStore.h"
 #include "platform/linux/preferences/TomlText.h"
-#include "support/MemoryLog.h"
-#include "support/MemoryPreferenceStore.h"
 #include "support/TemporaryDirectory.h"
+#include "support/memory/MemoryLog.h"
+#include "support/memory/MemoryPreferenceStore.h"
 
 namespace tonewerk {
 namespace {

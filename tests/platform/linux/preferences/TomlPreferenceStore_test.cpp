@@ -12,9 +12,9 @@
 #include <utility>
 #include <vector>
 
-#include "support/MemoryLog.h"
 #include "support/Stranger.h"
 #include "support/TemporaryDirectory.h"
+#include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
 namespace {

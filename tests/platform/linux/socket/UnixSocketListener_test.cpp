@@ -25,9 +25,9 @@
 #include "platform/linux/protobuf/Hex.h"
 #include "platform/linux/socket/RawClient.h"
 #include "platform/linux/threads/SystemClock.h"
-#include "support/MemoryLog.h"
 #include "support/Stranger.h"
 #include "support/TemporaryDirectory.h"
+#include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
 namespace {

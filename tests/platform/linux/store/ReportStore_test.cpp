@@ -16,11 +16,11 @@
 #include <vector>
 
 #include "platform/LogCategory.h"
-#include "support/ManualClock.h"
-#include "support/MemoryJsonService.h"
-#include "support/MemoryLog.h"
-#include "support/MemoryPreferenceStore.h"
 #include "support/TemporaryDirectory.h"
+#include "support/manual/ManualClock.h"
+#include "support/memory/MemoryJsonService.h"
+#include "support/memory/MemoryLog.h"
+#include "support/memory/MemoryPreferenceStore.h"
 
 namespace tonewerk {
 namespace {

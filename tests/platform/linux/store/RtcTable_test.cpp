@@ -5,8 +5,8 @@
 #include <gmock/gmock.h>
 
 #include "platform/linux/store/StoreDatabase.h"
-#include "support/MemoryJsonService.h"
 #include "support/TemporaryDirectory.h"
+#include "support/memory/MemoryJsonService.h"
 
 namespace tonewerk {
 namespace {

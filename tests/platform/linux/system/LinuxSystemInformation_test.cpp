@@ -8,8 +8,8 @@
 #include <utility>
 #include <vector>
 
-#include "support/ManualClock.h"
 #include "support/TemporaryDirectory.h"
+#include "support/manual/ManualClock.h"
 
 namespace tonewerk {
 namespace {

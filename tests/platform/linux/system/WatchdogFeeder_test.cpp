@@ -3,7 +3,7 @@
 
 #include <gtest/gtest.h>
 
-#include "support/ManualClock.h"
+#include "support/manual/ManualClock.h"
 
 namespace tonewerk {
 namespace {

@@ -3,7 +3,7 @@
 #include <thread>
 
 #include "platform/linux/threads/ThreadSemaphores.h"
-#include "support/ManualSemaphores.h"
+#include "support/manual/ManualSemaphores.h"
 
 namespace tonewerk {
 namespace {

@@ -6,7 +6,7 @@
 #include <vector>
 
 #include "platform/linux/threads/ThreadQueueFactory.h"
-#include "support/ManualQueues.h"
+#include "support/manual/ManualQueues.h"
 
 namespace tonewerk {
 namespace {

@@ -8,7 +8,7 @@
 #include <vector>
 
 #include "platform/linux/threads/TimerThread.h"
-#include "support/ManualTimers.h"
+#include "support/manual/ManualTimers.h"
 
 namespace tonewerk {
 namespace {

@@ -6,7 +6,7 @@
 #include <string>
 
 #include "service/TWReportingServiceExport.h"
-#include "support/MemoryJsonService.h"
+#include "support/memory/MemoryJsonService.h"
 
 namespace tonewerk {
 namespace {

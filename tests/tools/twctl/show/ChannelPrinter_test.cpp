@@ -7,7 +7,7 @@
 
 #include "platform/linux/json/NlohmannJsonService.h"
 #include "support/ChannelRecords.h"
-#include "support/MemoryChanmeter.h"
+#include "support/memory/MemoryChanmeter.h"
 #include "tools/twctl/Tool.h"
 #include "tools/twctl/show/ChannelText.h"
 

@@ -11,7 +11,7 @@
 #include "platform/linux/tracing/lttng/CallLimit.h"
 #include "platform/linux/tracing/lttng/LttngTrace.h"
 #include "platform/linux/tracing/lttng/TracingRig.h"
-#include "support/ManualTimers.h"
+#include "support/manual/ManualTimers.h"
 #include "tonewerk/signpost.h"
 
 namespace tonewerk {

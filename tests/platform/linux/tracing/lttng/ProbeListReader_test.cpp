@@ -3,8 +3,8 @@
 
 #include <gmock/gmock.h>
 
-#include "support/MemoryFileSystem.h"
-#include "support/MemoryJsonService.h"
+#include "support/memory/MemoryFileSystem.h"
+#include "support/memory/MemoryJsonService.h"
 
 namespace tonewerk {
 namespace {

@@ -16,9 +16,9 @@
 #include "platform/linux/threads/TimerThread.h"
 #include "platform/linux/tracing/lttng/LttngRuntrace.h"
 #include "platform/linux/tracing/lttng/TraceReaderKolvi.h"
-#include "support/MemoryLog.h"
 #include "support/TemporaryDirectory.h"
 #include "support/TracingTurn.h"
+#include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
 

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/MemoryMessaging.h"
+#include "support/memory/MemoryMessaging.h"
 
 #include <algorithm>
 #include <functional>

@@ -9,7 +9,7 @@
 #include <vector>
 
 #include "platform/Runtrace.h"
-#include "support/ManualClock.h"
+#include "support/manual/ManualClock.h"
 
 namespace tonewerk {
 

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/ManualClock.h"
+#include "support/manual/ManualClock.h"
 
 #include <algorithm>
 #include <cassert>

@@ -7,7 +7,7 @@
 #include <system_error>
 
 #include "platform/Benchfile.h"
-#include "support/MemoryFileSystem.h"
+#include "support/memory/MemoryFileSystem.h"
 
 namespace tonewerk {
 

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/MemoryDiagwire.h"
+#include "support/memory/MemoryDiagwire.h"
 
 #include <utility>
 

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/ManualQueues.h"
+#include "support/manual/ManualQueues.h"
 
 #include <algorithm>
 

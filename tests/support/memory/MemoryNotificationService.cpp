@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/MemoryNotificationService.h"
+#include "support/memory/MemoryNotificationService.h"
 
 #include <utility>
 

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/MemoryIssueDraftService.h"
+#include "support/memory/MemoryIssueDraftService.h"
 
 #include <utility>
 

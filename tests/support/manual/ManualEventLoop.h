@@ -6,7 +6,7 @@
 #include <memory>
 
 #include "bridges/pipewire/EventLoop.h"
-#include "support/ManualClock.h"
+#include "support/manual/ManualClock.h"
 
 namespace tonewerk {
 

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/MemoryMetricon.h"
+#include "support/memory/MemoryMetricon.h"
 
 #include <fnmatch.h>
 

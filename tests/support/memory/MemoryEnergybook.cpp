@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/MemoryEnergybook.h"
+#include "support/memory/MemoryEnergybook.h"
 
 #include <utility>
 

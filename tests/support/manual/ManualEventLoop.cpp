@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/ManualEventLoop.h"
+#include "support/manual/ManualEventLoop.h"
 
 #include <optional>
 #include <poll.h>

@@ -7,7 +7,7 @@
 #include <vector>
 
 #include "platform/TimerService.h"
-#include "support/ManualClock.h"
+#include "support/manual/ManualClock.h"
 
 namespace tonewerk {
 

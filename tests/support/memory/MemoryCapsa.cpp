@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/MemoryCapsa.h"
+#include "support/memory/MemoryCapsa.h"
 
 #include <mutex>
 #include <utility>

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/MemoryCommandRunner.h"
+#include "support/memory/MemoryCommandRunner.h"
 
 #include <utility>
 

@@ -4,7 +4,7 @@
 #include <memory>
 
 #include "platform/Semaphore.h"
-#include "support/ManualClock.h"
+#include "support/manual/ManualClock.h"
 
 namespace tonewerk {
 

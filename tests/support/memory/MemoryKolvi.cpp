@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/MemoryKolvi.h"
+#include "support/memory/MemoryKolvi.h"
 
 #include "platform/KolviProbeMaker.h"
 

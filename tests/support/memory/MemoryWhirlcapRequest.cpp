@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/MemoryWhirlcapRequest.h"
+#include "support/memory/MemoryWhirlcapRequest.h"
 
 #include <utility>
 

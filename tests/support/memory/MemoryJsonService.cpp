@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/MemoryJsonService.h"
+#include "support/memory/MemoryJsonService.h"
 
 #include <cmath>
 #include <nlohmann/json.hpp>

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/ManualTimers.h"
+#include "support/manual/ManualTimers.h"
 
 #include <cassert>
 

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/MemoryChanmeter.h"
+#include "support/memory/MemoryChanmeter.h"
 
 #include <algorithm>
 #include <utility>

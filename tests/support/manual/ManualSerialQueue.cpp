@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/ManualSerialQueue.h"
+#include "support/manual/ManualSerialQueue.h"
 
 #include <cassert>
 #include <utility>

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/MemoryPreferenceStore.h"
+#include "support/memory/MemoryPreferenceStore.h"
 
 #include <functional>
 #include <limits>

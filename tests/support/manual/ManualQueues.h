@@ -7,7 +7,7 @@
 #include <string_view>
 #include <vector>
 
-#include "support/ManualSerialQueue.h"
+#include "support/manual/ManualSerialQueue.h"
 
 namespace tonewerk {
 

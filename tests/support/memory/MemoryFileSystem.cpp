@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/MemoryFileSystem.h"
+#include "support/memory/MemoryFileSystem.h"
 
 #include <cassert>
 #include <string_view>

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/MemoryLog.h"
+#include "support/memory/MemoryLog.h"
 
 #include <functional>
 

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/ManualSemaphores.h"
+#include "support/manual/ManualSemaphores.h"
 
 #include <mutex>
 
