@@ -10,7 +10,7 @@
 #include <string>
 #include <string_view>
 
-#include "platform/ExportedInterface.h"
+#include "platform/RequestSet.h"
 #include "platform/linux/files/Utf8.h"
 #include "platform/linux/messagepack/RpcFrameReader.h"
 #include "platform/linux/messagepack/RpcLimits.h"
@@ -19,8 +19,8 @@
 namespace tonewerk {
 namespace {
 
-const ExportedInterface& fuzzInterface() {
-  static const ExportedInterface interface {
+const RequestSet& fuzzInterface() {
+  static const RequestSet interface {
     {
       {"number", {{"number", ParameterType::kInt64}}}, {"short", {{"number", ParameterType::kUInt16}}},
           {"message",

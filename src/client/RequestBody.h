@@ -7,7 +7,7 @@
 #include <string>
 #include <string_view>
 
-#include "platform/ExportedInterface.h"
+#include "platform/RequestSet.h"
 #include "tonewerk/reporting.h"
 
 namespace tonewerk {

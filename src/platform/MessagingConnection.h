@@ -6,7 +6,7 @@
 #include <memory>
 #include <string>
 
-#include "platform/ExportedInterface.h"
+#include "platform/RequestSet.h"
 
 namespace tonewerk {
 
@@ -31,7 +31,7 @@ class MessagingConnection {
 
   // Before resume(). `interface` must outlive the connection; `object` is held until the invalidation handler
   // has returned.
-  virtual void exportObject(const ExportedInterface& interface, std::shared_ptr<ExportedObject> object) = 0;
+  virtual void exportObject(const RequestSet& interface, std::shared_ptr<RequestHandler> object) = 0;
 
   // Before resume(). Called when the connection has ended, in one direction or both, first the interruption
   // handler, then the invalidation handler, once each.

@@ -6,7 +6,7 @@
 #include <deque>
 #include <memory>
 
-#include "platform/ExportedInterface.h"
+#include "platform/RequestSet.h"
 #include "service/MessageFilter.h"
 #include "session/AudioEvent.h"
 #include "values/Value.h"

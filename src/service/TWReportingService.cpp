@@ -57,7 +57,7 @@ bool TWReportingService::listenerShouldAcceptNewConnection(MessagingConnection& 
       if (service != nullptr && listed != nullptr) registerClient(listed);
     });
     connection.exportObject(
-        TWReportingServiceExport::exportedInterface(),
+        TWReportingServiceExport::requestSet(),
         std::make_shared<TWReportingServiceExport>(
             std::move(client), std::make_unique<WatchExport>(processIdentifier, weak_from_this())));
   }

@@ -61,7 +61,7 @@ TWReportingServiceProtocol::ReporterIDs reporterIDsOf(const Argument& argument) 
   return identifiers;
 }
 
-std::vector<Method> requestSet() {
+std::vector<Method> requestMethods() {
   constexpr Parameter kReporterID{"reporterID", ParameterType::kInt64};
   constexpr Parameter kServiceType{"serviceType", ParameterType::kUInt16};
   constexpr Result kSuccess{ResultType::kBoolean, "success"};
@@ -88,12 +88,12 @@ std::vector<Method> requestSet() {
 }  // namespace
 
 TWReportingServiceExport::TWReportingServiceExport(std::shared_ptr<TWReportingServiceProtocol> object,
-                                                   std::unique_ptr<ExportedObject> watch)
+                                                   std::unique_ptr<RequestHandler> watch)
     : object_(std::move(object)), watch_(std::move(watch)) {}
 
-const ExportedInterface& TWReportingServiceExport::exportedInterface() {
-  static const ExportedInterface interface = [] {
-    ExportedInterface all{requestSet()};
+const RequestSet& TWReportingServiceExport::requestSet() {
+  static const RequestSet interface = [] {
+    RequestSet all{requestMethods()};
     const std::vector<Method>& watch = WatchExport::methods();
     all.methods.insert(all.methods.end(), watch.begin(), watch.end());
     return all;
@@ -109,7 +109,7 @@ std::optional<ReplyError> TWReportingServiceExport::takeRole(std::size_t method)
   } else if (changesSomething(method)) {
     if (role_ == Role::kOnlooker) {
       return messagingError(kNotPermitted, "not permitted: the connection only looks on since observe, and " +
-                                               std::string(exportedInterface().methods[method].name) +
+                                               std::string(requestSet().methods[method].name) +
                                                " changes something");
     }
     role_ = Role::kClient;

@@ -5,7 +5,7 @@
 #include <memory>
 #include <optional>
 
-#include "platform/ExportedInterface.h"
+#include "platform/RequestSet.h"
 #include "service/TWReportingServiceProtocol.h"
 
 namespace tonewerk {
@@ -15,15 +15,15 @@ namespace tonewerk {
 //
 // A connection is a client or an onlooker, whichever it is first: an onlooker's requests that change
 // something are refused, and so is a client's request to be an onlooker.
-class TWReportingServiceExport final : public ExportedObject {
+class TWReportingServiceExport final : public RequestHandler {
  public:
   TWReportingServiceExport(std::shared_ptr<TWReportingServiceProtocol> object,
-                           std::unique_ptr<ExportedObject> watch);
+                           std::unique_ptr<RequestHandler> watch);
 
   void handleRequest(std::size_t method, Arguments arguments, Reply reply, RequestToken token) override;
 
   // What the daemon exports: names and parameters of its requests, those beyond the request set last.
-  static const ExportedInterface& exportedInterface();
+  static const RequestSet& requestSet();
 
  private:
   enum class Role { kOpen, kClient, kOnlooker };
@@ -33,7 +33,7 @@ class TWReportingServiceExport final : public ExportedObject {
 
   Role role_ = Role::kOpen;  // the messaging thread's
   const std::shared_ptr<TWReportingServiceProtocol> object_;
-  const std::unique_ptr<ExportedObject> watch_;
+  const std::unique_ptr<RequestHandler> watch_;
 };
 
 }  // namespace tonewerk

@@ -5,7 +5,7 @@
 #include <string_view>
 #include <vector>
 
-#include "platform/ExportedInterface.h"
+#include "platform/RequestSet.h"
 #include "session/AudioEvent.h"
 #include "values/Value.h"
 

@@ -6,7 +6,7 @@
 #include <memory>
 #include <vector>
 
-#include "platform/ExportedInterface.h"
+#include "platform/RequestSet.h"
 
 namespace tonewerk {
 
@@ -14,7 +14,7 @@ class MessageWatcher;
 class TWReportingServiceDelegateProtocol;
 
 // One connection's requests to see what the daemon does now: its sessions, and messages as they arrive.
-class WatchExport final : public ExportedObject {
+class WatchExport final : public RequestHandler {
  public:
   // `service` is held weakly; a request that finds it gone does nothing.
   WatchExport(std::int32_t processIdentifier, std::weak_ptr<TWReportingServiceDelegateProtocol> service);

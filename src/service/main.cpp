@@ -109,8 +109,8 @@ class Daemon {
         context_(platformOf(linux, directories), allWorkerClasses()),
         service_(TWReportingService::make([this] { endOnKillRequest(); })),
         listener_(std::move(socket), log, watchdogOf(manager, linux.clock()), ::geteuid(), &linux.memory()),
-        dbusListener_(dbusNames(), TWReportingServiceExport::exportedInterface(),
-                      dbusAddressFromEnvironment(), log, &linux.memory()) {
+        dbusListener_(dbusNames(), TWReportingServiceExport::requestSet(), dbusAddressFromEnvironment(), log,
+                      &linux.memory()) {
     diagnostics_.removeLeftovers();  // the socket is ours, so no other daemon writes there
     // Asked for now, so that device facts that are read again later change nothing about it.
     hasSignposts_ = context_.isInternalBuild() && isTracingBuiltIn();

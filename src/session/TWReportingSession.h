@@ -12,7 +12,7 @@
 #include <utility>
 #include <vector>
 
-#include "platform/ExportedInterface.h"
+#include "platform/RequestSet.h"
 #include "session/AudioEvent.h"
 #include "session/KeptBytesBudget.h"
 #include "session/TWReportingSessionMessage.h"

@@ -51,7 +51,7 @@ class RandomFrames {
  private:
   // All but the one that ends the daemon.
   const Method& anyMethod() {
-    const std::vector<Method>& methods = TWReportingServiceExport::exportedInterface().methods;
+    const std::vector<Method>& methods = TWReportingServiceExport::requestSet().methods;
     for (;;) {
       const Method& method = methods[below(methods.size())];
       if (method.result.type != ResultType::kNever) return method;

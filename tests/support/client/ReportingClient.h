@@ -11,7 +11,7 @@
 #include <system_error>
 #include <vector>
 
-#include "platform/ExportedInterface.h"
+#include "platform/RequestSet.h"
 #include "values/Value.h"
 
 namespace tonewerk {

@@ -22,7 +22,7 @@ class MemoryClient::Connection final : public MessagingConnection,
   std::string description() const override {
     return "memory connection of " + std::to_string(processIdentifier_);
   }
-  void exportObject(const ExportedInterface& interface, std::shared_ptr<ExportedObject> object) override {
+  void exportObject(const RequestSet& interface, std::shared_ptr<RequestHandler> object) override {
     interface_ = &interface;
     object_ = std::move(object);
   }
@@ -110,14 +110,14 @@ class MemoryClient::Connection final : public MessagingConnection,
       ++unfinished_;
     }
     // Held here, too: the request itself may end the connection.
-    const std::shared_ptr<ExportedObject> object = object_;
+    const std::shared_ptr<RequestHandler> object = object_;
     object->handleRequest(*place, std::move(request.arguments), reply, RequestToken(shared_from_this(), 0));
   }
 
   const std::int32_t processIdentifier_;
   const std::uint32_t userIdentifier_;
-  const ExportedInterface* interface_ = nullptr;
-  std::shared_ptr<ExportedObject> object_;
+  const RequestSet* interface_ = nullptr;
+  std::shared_ptr<RequestHandler> object_;
   std::function<void()> interrupted_;
   std::function<void()> invalidated_;
   bool isResumed_ = false;

@@ -61,12 +61,12 @@ class ScriptedDaemon {
   }
 
  private:
-  class Object final : public ExportedObject {
+  class Object final : public RequestHandler {
    public:
     explicit Object(ScriptedDaemon& daemon) : daemon_(daemon) {}
     void handleRequest(std::size_t method, Arguments arguments, Reply reply,
                        RequestToken /*token*/) override {
-      daemon_.handle(std::string(TWReportingServiceExport::exportedInterface().methods[method].name),
+      daemon_.handle(std::string(TWReportingServiceExport::requestSet().methods[method].name),
                      std::move(arguments), reply);
     }
 
@@ -78,8 +78,7 @@ class ScriptedDaemon {
    public:
     explicit Delegate(ScriptedDaemon& daemon) : daemon_(daemon) {}
     bool listenerShouldAcceptNewConnection(MessagingConnection& connection) override {
-      connection.exportObject(TWReportingServiceExport::exportedInterface(),
-                              std::make_shared<Object>(daemon_));
+      connection.exportObject(TWReportingServiceExport::requestSet(), std::make_shared<Object>(daemon_));
       connection.resume();
       return true;
     }

@@ -4,7 +4,7 @@
 #include <optional>
 #include <string>
 
-#include "platform/ExportedInterface.h"
+#include "platform/RequestSet.h"
 #include "platform/linux/dbus/SdBus.h"
 
 namespace tonewerk {

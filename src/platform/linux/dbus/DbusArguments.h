@@ -4,7 +4,7 @@
 #include <cstddef>
 #include <optional>
 
-#include "platform/ExportedInterface.h"
+#include "platform/RequestSet.h"
 #include "platform/linux/dbus/DbusInterface.h"
 #include "platform/linux/messagepack/RpcFrameReader.h"
 

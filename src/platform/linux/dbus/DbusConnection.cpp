@@ -44,7 +44,7 @@ std::string DbusConnection::description() const {
          std::to_string(peer_.processIdentifier) + ", user " + user + ", on D-Bus as " + name_;
 }
 
-void DbusConnection::exportObject(const ExportedInterface&, std::shared_ptr<ExportedObject> object) {
+void DbusConnection::exportObject(const RequestSet&, std::shared_ptr<RequestHandler> object) {
   object_ = std::move(object);
 }
 
@@ -81,7 +81,7 @@ void DbusConnection::handOver(Request request) {
     return;
   }
   // Held here, too: what the request leads to may end the connection.
-  const std::shared_ptr<ExportedObject> object = object_;
+  const std::shared_ptr<RequestHandler> object = object_;
   object->handleRequest(request.method, std::move(request.arguments), std::move(request.reply),
                         std::move(request.token));
 }

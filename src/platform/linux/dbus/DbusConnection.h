@@ -59,7 +59,7 @@ class DbusConnection final : public MessagingConnection {
   std::int32_t processIdentifier() const override { return peer_.processIdentifier; }
   std::uint32_t userIdentifier() const override { return peer_.userIdentifier; }
   std::string description() const override;
-  void exportObject(const ExportedInterface& interface, std::shared_ptr<ExportedObject> object) override;
+  void exportObject(const RequestSet& interface, std::shared_ptr<RequestHandler> object) override;
   void setInterruptionHandler(std::function<void()> handler) override { interrupted_ = std::move(handler); }
   void setInvalidationHandler(std::function<void()> handler) override { invalidated_ = std::move(handler); }
   void resume() override;
@@ -96,7 +96,7 @@ class DbusConnection final : public MessagingConnection {
   const std::string name_;
   DbusPeer peer_;
 
-  std::shared_ptr<ExportedObject> object_;
+  std::shared_ptr<RequestHandler> object_;
   std::function<void()> interrupted_;
   std::function<void()> invalidated_;
   bool isIdentified_ = false;

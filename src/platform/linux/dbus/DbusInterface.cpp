@@ -82,7 +82,7 @@ std::string_view dbusSignatureOf(ResultType type) {
   return "";
 }
 
-DbusInterface::DbusInterface(const ExportedInterface& methods) : methods_(methods) {
+DbusInterface::DbusInterface(const RequestSet& methods) : methods_(methods) {
   entries_.reserve(methods.methods.size());
   for (std::size_t place = 0; place < methods.methods.size(); ++place) {
     const Method& method = methods.methods[place];

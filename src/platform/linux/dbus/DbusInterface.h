@@ -6,7 +6,7 @@
 #include <string_view>
 #include <vector>
 
-#include "platform/ExportedInterface.h"
+#include "platform/RequestSet.h"
 
 struct sd_bus_vtable;
 
@@ -28,7 +28,7 @@ class DbusInterface {
   };
 
   // `methods` outlives it.
-  explicit DbusInterface(const ExportedInterface& methods);
+  explicit DbusInterface(const RequestSet& methods);
   DbusInterface(const DbusInterface&) = delete;
   DbusInterface& operator=(const DbusInterface&) = delete;
   ~DbusInterface();
@@ -42,7 +42,7 @@ class DbusInterface {
   const sd_bus_vtable* vtable() const { return vtable_.data(); }
 
  private:
-  const ExportedInterface& methods_;
+  const RequestSet& methods_;
   std::vector<Entry> entries_;
   std::vector<sd_bus_vtable> vtable_;
 };

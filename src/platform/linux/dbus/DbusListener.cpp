@@ -13,7 +13,7 @@
 
 namespace tonewerk {
 
-DbusListener::DbusListener(DbusNames names, const ExportedInterface& methods, std::string address,
+DbusListener::DbusListener(DbusNames names, const RequestSet& methods, std::string address,
                            const LogCategory& log, AllocatorReclaimer* memory)
     : names_(std::move(names)),
       address_(std::move(address)),

@@ -31,7 +31,7 @@ class DbusListener final : public MessagingListener {
   // `methods` and `log` outlive the listener; delegates export objects of these methods. `address` is a D-Bus
   // address, empty for the system's bus. `memory`, which outlives the listener, is told of what clients
   // bring, and of their ends.
-  DbusListener(DbusNames names, const ExportedInterface& methods, std::string address, const LogCategory& log,
+  DbusListener(DbusNames names, const RequestSet& methods, std::string address, const LogCategory& log,
                AllocatorReclaimer* memory = nullptr);
   ~DbusListener() override;
 

@@ -9,7 +9,7 @@
 #include <mutex>
 #include <optional>
 
-#include "platform/ExportedInterface.h"
+#include "platform/RequestSet.h"
 #include "platform/linux/threads/IoWaker.h"
 #include "platform/linux/threads/WorkBatch.h"
 

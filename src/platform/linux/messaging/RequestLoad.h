@@ -7,7 +7,7 @@
 #include <limits>
 #include <memory>
 
-#include "platform/ExportedInterface.h"
+#include "platform/RequestSet.h"
 #include "platform/linux/threads/IoWaker.h"
 
 namespace tonewerk {

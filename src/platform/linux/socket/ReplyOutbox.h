@@ -8,7 +8,7 @@
 #include <mutex>
 #include <string>
 
-#include "platform/ExportedInterface.h"
+#include "platform/RequestSet.h"
 #include "platform/linux/threads/IoWaker.h"
 #include "platform/linux/threads/WorkBatch.h"
 

@@ -62,8 +62,7 @@ std::string UnixConnection::description() const {
          ", user " + std::to_string(userIdentifier_);
 }
 
-void UnixConnection::exportObject(const ExportedInterface& interface,
-                                  std::shared_ptr<ExportedObject> object) {
+void UnixConnection::exportObject(const RequestSet& interface, std::shared_ptr<RequestHandler> object) {
   interface_ = &interface;
   object_ = std::move(object);
 }

@@ -50,7 +50,7 @@ class UnixConnection final : public MessagingConnection {
   std::int32_t processIdentifier() const override { return processIdentifier_; }
   std::uint32_t userIdentifier() const override { return userIdentifier_; }
   std::string description() const override;
-  void exportObject(const ExportedInterface& interface, std::shared_ptr<ExportedObject> object) override;
+  void exportObject(const RequestSet& interface, std::shared_ptr<RequestHandler> object) override;
   void setInterruptionHandler(std::function<void()> handler) override { interrupted_ = std::move(handler); }
   void setInvalidationHandler(std::function<void()> handler) override { invalidated_ = std::move(handler); }
   void resume() override;
@@ -79,8 +79,8 @@ class UnixConnection final : public MessagingConnection {
   std::int32_t processIdentifier_ = 0;
   std::uint32_t userIdentifier_ = kNoUser;
 
-  const ExportedInterface* interface_ = nullptr;
-  std::shared_ptr<ExportedObject> object_;
+  const RequestSet* interface_ = nullptr;
+  std::shared_ptr<RequestHandler> object_;
   std::function<void()> interrupted_;
   std::function<void()> invalidated_;
   bool isResumed_ = false;

@@ -38,8 +38,7 @@ std::optional<Recording> readRecording(Tool& tool, const std::string& file) {
   errno = 0;
   std::ifstream text(file);
   std::optional<Recording> recording;
-  if (text)
-    recording = Recording::read(text, TWReportingServiceExport::exportedInterface(), tool.json, problem);
+  if (text) recording = Recording::read(text, TWReportingServiceExport::requestSet(), tool.json, problem);
   // A directory opens, and fails to be read.
   if (!text.is_open() || text.bad()) {
     const int reason = errno != 0 ? errno : EIO;

@@ -54,7 +54,7 @@ std::string takeMembers(const ValueMap& members, RecordedCall& call) {
   return {};
 }
 
-std::string checkRequest(const RecordedCall& call, const ExportedInterface& interface) {
+std::string checkRequest(const RecordedCall& call, const RequestSet& interface) {
   const auto method = interface.find(call.method);
   if (!method) return "there is no request \"" + call.method + "\"";
   // With any time: what a time stands for is a number whenever it is played.
@@ -72,7 +72,7 @@ Arguments RecordedCall::parametersAt(double now) const {
   return resolved;
 }
 
-std::optional<Recording> Recording::read(std::istream& text, const ExportedInterface& interface,
+std::optional<Recording> Recording::read(std::istream& text, const RequestSet& interface,
                                          const JsonService& json, std::string& problem) {
   Recording recording;
   std::string line;

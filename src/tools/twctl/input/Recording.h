@@ -7,7 +7,7 @@
 #include <string>
 #include <vector>
 
-#include "platform/ExportedInterface.h"
+#include "platform/RequestSet.h"
 
 namespace tonewerk {
 
@@ -36,7 +36,7 @@ class Recording {
  public:
   // None when a line is not one of the above, or no request that `interface` has; `problem` then says "line
   // 3: why".
-  static std::optional<Recording> read(std::istream& text, const ExportedInterface& interface,
+  static std::optional<Recording> read(std::istream& text, const RequestSet& interface,
                                        const JsonService& json, std::string& problem);
 
   const std::vector<RecordedCall>& calls() const { return calls_; }

@@ -64,7 +64,7 @@ class RecordingDaemon final : private MessagingListenerDelegate {
   }
 
  private:
-  class Object final : public ExportedObject {
+  class Object final : public RequestHandler {
    public:
     explicit Object(RecordingDaemon& daemon) : daemon_(daemon) {}
     void handleRequest(std::size_t method, Arguments arguments, Reply reply, RequestToken) override {
@@ -75,7 +75,7 @@ class RecordingDaemon final : private MessagingListenerDelegate {
     RecordingDaemon& daemon_;
   };
 
-  static const ExportedInterface& interface() { return TWReportingServiceExport::exportedInterface(); }
+  static const RequestSet& interface() { return TWReportingServiceExport::requestSet(); }
 
   bool listenerShouldAcceptNewConnection(MessagingConnection& connection) override {
     connection.exportObject(interface(), std::make_shared<Object>(*this));

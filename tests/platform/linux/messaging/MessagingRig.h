@@ -27,11 +27,11 @@ struct ReceivedRequest {
 };
 
 // One method for every parameter type, and some that answer in their own way.
-inline const ExportedInterface& rigInterface() {
+inline const RequestSet& rigInterface() {
   constexpr Parameter kNumber{"number", ParameterType::kInt64};
   constexpr Parameter kMap{"map", ParameterType::kMap};
   constexpr Result kAnswer{ResultType::kAny, "answer"};
-  static const ExportedInterface interface {
+  static const RequestSet interface {
     {
       {"takeInt64", {kNumber}}, {"takeUInt32", {{"number", ParameterType::kUInt32}}},
           {"takeUInt16", {{"number", ParameterType::kUInt16}}}, {"takeMap", {kMap}},
@@ -110,7 +110,7 @@ class MessagingRecord {
   std::vector<std::pair<Reply, RequestToken>> held_;
 };
 
-class RigObject final : public ExportedObject {
+class RigObject final : public RequestHandler {
  public:
   explicit RigObject(MessagingRecord& record) : record_(record) {}
   RigObject(const RigObject&) = delete;

@@ -20,7 +20,7 @@ class RecordingTest : public testing::Test {
  protected:
   std::optional<Recording> read(const std::string& text) {
     std::istringstream stream(text);
-    return Recording::read(stream, TWReportingServiceExport::exportedInterface(), json_, problem_);
+    return Recording::read(stream, TWReportingServiceExport::requestSet(), json_, problem_);
   }
   std::string problemOf(const std::string& text) {
     problem_.clear();

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "platform/ExportedInterface.h"
+#include "platform/RequestSet.h"
 
 #include <limits>
 
@@ -66,7 +66,7 @@ std::string_view wordsFor(ParameterType type) {
 
 }  // namespace
 
-std::optional<std::size_t> ExportedInterface::find(std::string_view name) const {
+std::optional<std::size_t> RequestSet::find(std::string_view name) const {
   for (std::size_t at = 0; at < methods.size(); ++at) {
     if (methods[at].name == name) return at;
   }

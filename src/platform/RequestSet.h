@@ -42,7 +42,7 @@ struct Method {
 };
 
 // The request set of an exported object. A request names its method by the place in `methods`.
-struct ExportedInterface {
+struct RequestSet {
   std::vector<Method> methods;
 
   std::optional<std::size_t> find(std::string_view name) const;
@@ -141,9 +141,9 @@ class RequestToken {
 };
 
 // What a connection's requests are made to.
-class ExportedObject {
+class RequestHandler {
  public:
-  virtual ~ExportedObject() = default;
+  virtual ~RequestHandler() = default;
 
   // On the messaging thread, in the order of arrival; must not block. `arguments` suit the method.
   virtual void handleRequest(std::size_t method, Arguments arguments, Reply reply, RequestToken token) = 0;

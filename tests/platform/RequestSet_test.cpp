@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "platform/ExportedInterface.h"
+#include "platform/RequestSet.h"
 
 #include <gtest/gtest.h>
 #include <limits>
@@ -22,7 +22,7 @@ void expectRefused(ParameterType type, const Argument& argument) {
   EXPECT_NE(problemOf(type, argument), std::nullopt) << (argument ? argument->text() : "nil");
 }
 
-TEST(ExportedInterfaceTest, ASignedIntegerHasAllSixtyFourBits) {
+TEST(RequestSetTest, ASignedIntegerHasAllSixtyFourBits) {
   constexpr ParameterType kType = ParameterType::kInt64;
   for (const Value& value :
        {Value(kLeast), Value(-1), Value(0), Value(kMost), Value(static_cast<std::uint64_t>(kMost))}) {
@@ -31,7 +31,7 @@ TEST(ExportedInterfaceTest, ASignedIntegerHasAllSixtyFourBits) {
   expectRefused(kType, Value(static_cast<std::uint64_t>(kMost) + 1));
 }
 
-TEST(ExportedInterfaceTest, AThirtyTwoBitIntegerReachesFromZeroTo4294967295) {
+TEST(RequestSetTest, AThirtyTwoBitIntegerReachesFromZeroTo4294967295) {
   constexpr ParameterType kType = ParameterType::kUInt32;
   for (const Value& value : {Value(0), Value(0U), Value(4294967295), Value(std::uint64_t{4294967295})}) {
     expectSuits(kType, value);
@@ -41,14 +41,14 @@ TEST(ExportedInterfaceTest, AThirtyTwoBitIntegerReachesFromZeroTo4294967295) {
   }
 }
 
-TEST(ExportedInterfaceTest, ASixteenBitIntegerReachesFromZeroTo65535) {
+TEST(RequestSetTest, ASixteenBitIntegerReachesFromZeroTo65535) {
   constexpr ParameterType kType = ParameterType::kUInt16;
   for (const Value& value : {Value(0), Value(65535), Value(std::uint64_t{65535})}) expectSuits(kType, value);
   for (const Value& value : {Value(-1), Value(65536), Value(std::uint64_t{65536})})
     expectRefused(kType, value);
 }
 
-TEST(ExportedInterfaceTest, NothingElseIsAnInteger) {
+TEST(RequestSetTest, NothingElseIsAnInteger) {
   for (const ParameterType type : {ParameterType::kInt64, ParameterType::kUInt32, ParameterType::kUInt16}) {
     expectRefused(type, Value(1.0));
     expectRefused(type, Value(true));
@@ -59,14 +59,14 @@ TEST(ExportedInterfaceTest, NothingElseIsAnInteger) {
   }
 }
 
-TEST(ExportedInterfaceTest, AMapIsAMap) {
+TEST(RequestSetTest, AMapIsAMap) {
   expectSuits(ParameterType::kMap, Value(ValueMap()));
   expectRefused(ParameterType::kMap, Value(ValueArray()));
   expectRefused(ParameterType::kMap, Value("{}"));
   expectRefused(ParameterType::kMap, std::nullopt);
 }
 
-TEST(ExportedInterfaceTest, AListOfIntegersMayBeNilOrEmpty) {
+TEST(RequestSetTest, AListOfIntegersMayBeNilOrEmpty) {
   constexpr ParameterType kType = ParameterType::kInt64ListOrNone;
   expectSuits(kType, std::nullopt);
   expectSuits(kType, Value(ValueArray()));
@@ -78,21 +78,21 @@ TEST(ExportedInterfaceTest, AListOfIntegersMayBeNilOrEmpty) {
   expectRefused(kType, Value(ValueMap()));
 }
 
-TEST(ExportedInterfaceTest, TheNumberOfArgumentsMustBeRight) {
+TEST(RequestSetTest, TheNumberOfArgumentsMustBeRight) {
   const Method method{"two", {{"a", ParameterType::kInt64}, {"b", ParameterType::kInt64ListOrNone}}};
   EXPECT_EQ(problemWith(method, {Value(1), std::nullopt}), std::nullopt);
   EXPECT_EQ(problemWith(method, {Value(1)}), "two takes 2 arguments, not 1");
   EXPECT_EQ(problemWith(method, {Value(1), std::nullopt, Value(2)}), "two takes 2 arguments, not 3");
 }
 
-TEST(ExportedInterfaceTest, AProblemNamesMethodAndArgument) {
+TEST(RequestSetTest, AProblemNamesMethodAndArgument) {
   const Method method{"send", {{"id", ParameterType::kInt64}, {"category", ParameterType::kUInt32}}};
   EXPECT_EQ(problemWith(method, {Value(1), Value(-1)}),
             "send: argument 2 (category) must be an integer from 0 to 4294967295");
 }
 
-TEST(ExportedInterfaceTest, FindsAMethodByItsWholeName) {
-  const ExportedInterface interface {
+TEST(RequestSetTest, FindsAMethodByItsWholeName) {
+  const RequestSet interface {
     {
       {"start", {}}, {
         "stop", {}
@@ -128,7 +128,7 @@ TEST(RequestTokenTest, FinishesItsRequestOnceWhereverItIsCarried) {
   EXPECT_EQ(gauge->bytes, 15U);
 }
 
-TEST(ExportedInterfaceTest, WhatIsForTheOwnerIsForTheDaemonsUserAndRoot) {
+TEST(RequestSetTest, WhatIsForTheOwnerIsForTheDaemonsUserAndRoot) {
   constexpr std::uint32_t kOwner = 500;
   const Method method{"watch", {}, {}, 0, true};
   EXPECT_EQ(problemWithCaller(method, kOwner, kOwner), std::nullopt);
@@ -139,12 +139,12 @@ TEST(ExportedInterfaceTest, WhatIsForTheOwnerIsForTheDaemonsUserAndRoot) {
   EXPECT_EQ(problemWithCaller(method, 501, 0), refusal);
 }
 
-TEST(ExportedInterfaceTest, APeerOfWhomTheKernelSaysNothingIsNobodysOwner) {
+TEST(RequestSetTest, APeerOfWhomTheKernelSaysNothingIsNobodysOwner) {
   EXPECT_NE(problemWithCaller(Method{"watch", {}, {}, 0, true}, kNoUser, 500), std::nullopt);
   EXPECT_NE(problemWithCaller(Method{"watch", {}, {}, 0, true}, kNoUser, kNoUser), std::nullopt);
 }
 
-TEST(ExportedInterfaceTest, EverythingElseIsForEverybody) {
+TEST(RequestSetTest, EverythingElseIsForEverybody) {
   EXPECT_EQ(problemWithCaller(Method{"test", {}}, 501, 500), std::nullopt);
   EXPECT_EQ(problemWithCaller(Method{"test", {}}, kNoUser, 500), std::nullopt);
 }
