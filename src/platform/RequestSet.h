@@ -108,27 +108,27 @@ class Reply {
 };
 
 // Counts the requests of one connection that are not finished. Any thread.
-class RequestGauge {
+class InFlightCounter {
  public:
-  virtual ~RequestGauge() = default;
+  virtual ~InFlightCounter() = default;
   virtual void finished(std::size_t bytes) = 0;
 };
 
 // Says, by its destruction, that a request's body has run. Whoever carries the body to a queue carries this
 // with it.
-class RequestToken {
+class InFlightToken {
  public:
-  RequestToken() = default;
-  RequestToken(std::shared_ptr<RequestGauge> gauge, std::size_t bytes)
+  InFlightToken() = default;
+  InFlightToken(std::shared_ptr<InFlightCounter> gauge, std::size_t bytes)
       : gauge_(std::move(gauge)), bytes_(bytes) {}
-  RequestToken(RequestToken&&) noexcept = default;
-  RequestToken& operator=(RequestToken&& other) noexcept {
+  InFlightToken(InFlightToken&&) noexcept = default;
+  InFlightToken& operator=(InFlightToken&& other) noexcept {
     finish();
     gauge_ = std::move(other.gauge_);
     bytes_ = other.bytes_;
     return *this;
   }
-  ~RequestToken() { finish(); }
+  ~InFlightToken() { finish(); }
 
  private:
   void finish() {
@@ -136,7 +136,7 @@ class RequestToken {
     gauge_ = nullptr;
   }
 
-  std::shared_ptr<RequestGauge> gauge_;
+  std::shared_ptr<InFlightCounter> gauge_;
   std::size_t bytes_ = 0;
 };
 
@@ -146,7 +146,7 @@ class RequestHandler {
   virtual ~RequestHandler() = default;
 
   // On the messaging thread, in the order of arrival; must not block. `arguments` suit the method.
-  virtual void handleRequest(std::size_t method, Arguments arguments, Reply reply, RequestToken token) = 0;
+  virtual void handleRequest(std::size_t method, Arguments arguments, Reply reply, InFlightToken token) = 0;
 };
 
 }  // namespace tonewerk

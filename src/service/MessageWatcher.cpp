@@ -55,7 +55,7 @@ MessageWatcher::SeenMessage MessageWatcher::takeOldest() {
   return oldest;
 }
 
-void MessageWatcher::next(Reply reply, RequestToken token) {
+void MessageWatcher::next(Reply reply, InFlightToken token) {
   if (isHeld_) answerHeld();
   if (hasNews()) return reply(std::nullopt, takeAnswer());
   isHeld_ = true;
@@ -72,7 +72,7 @@ void MessageWatcher::answerHeld() {
   if (!std::exchange(isHeld_, false)) return;
   heldReply_(std::nullopt, takeAnswer());
   heldReply_ = Reply();
-  heldToken_ = RequestToken();
+  heldToken_ = InFlightToken();
 }
 
 ValueMap MessageWatcher::takeAnswer() {

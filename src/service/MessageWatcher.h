@@ -44,7 +44,7 @@ class MessageWatcher final : public std::enable_shared_from_this<MessageWatcher>
 
   // Answers {"missed", "messages"}, now or when there is something. A request that is still held back is
   // answered with nothing: there is one at a time.
-  void next(Reply reply, RequestToken token);
+  void next(Reply reply, InFlightToken token);
 
   std::size_t waitingMessages() const { return waiting_.size(); }
   std::size_t waitingBytes() const { return waitingBytes_; }
@@ -78,7 +78,7 @@ class MessageWatcher final : public std::enable_shared_from_this<MessageWatcher>
   bool isHeld_ = false;
   bool answerIsQueued_ = false;
   Reply heldReply_;
-  RequestToken heldToken_;
+  InFlightToken heldToken_;
 };
 
 }  // namespace tonewerk

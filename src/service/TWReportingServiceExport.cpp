@@ -118,7 +118,7 @@ std::optional<ReplyError> TWReportingServiceExport::takeRole(std::size_t method)
 }
 
 void TWReportingServiceExport::handleRequest(std::size_t method, Arguments arguments, Reply reply,
-                                             RequestToken token) {
+                                             InFlightToken token) {
   if (const std::optional<ReplyError> error = takeRole(method)) return reply(error);
   if (method >= kFirstWatchMethod) {
     return watch_->handleRequest(method - kFirstWatchMethod, std::move(arguments), std::move(reply),

@@ -20,7 +20,7 @@ class TWReportingServiceExport final : public RequestHandler {
   TWReportingServiceExport(std::shared_ptr<TWReportingServiceProtocol> object,
                            std::unique_ptr<RequestHandler> watch);
 
-  void handleRequest(std::size_t method, Arguments arguments, Reply reply, RequestToken token) override;
+  void handleRequest(std::size_t method, Arguments arguments, Reply reply, InFlightToken token) override;
 
   // What the daemon exports: names and parameters of its requests, those beyond the request set last.
   static const RequestSet& requestSet();

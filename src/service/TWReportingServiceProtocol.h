@@ -18,7 +18,7 @@ inline constexpr std::string_view TWReporterProxyKeyServiceType = "serviceType";
 // The way back for one request, and what says that its body has run.
 struct ServiceRequest {
   Reply reply;
-  RequestToken token;
+  InFlightToken token;
 };
 
 // The daemon's request set, as a client's connection makes it, and the request to be no client but an

@@ -67,7 +67,7 @@ const std::vector<Method>& WatchExport::methods() {
   return methods;
 }
 
-void WatchExport::handleRequest(std::size_t method, Arguments arguments, Reply reply, RequestToken token) {
+void WatchExport::handleRequest(std::size_t method, Arguments arguments, Reply reply, InFlightToken token) {
   // What runs later holds the watcher, not this object, which goes with the connection.
   const auto onWorkQueue = [&](auto body) {
     TWReportingUtilityGetReportingServerQueue().async(
@@ -77,14 +77,14 @@ void WatchExport::handleRequest(std::size_t method, Arguments arguments, Reply r
   };
   switch (method) {
     case kSessions:
-      return onWorkQueue([first = placeOf(arguments[0])](auto& service, const Reply& answer, RequestToken&) {
+      return onWorkQueue([first = placeOf(arguments[0])](auto& service, const Reply& answer, InFlightToken&) {
         answer(std::nullopt, sessionListing(service, first));
       });
     case kOpenMessages: {
       MessageFilter filter{numbersOf(arguments[0]), numbersOf(arguments[1]), numbersOf(arguments[2])};
       if (filter.size() > MessageFilter::kMostEntries) return reply(tooManyEntries(filter.size()));
       return onWorkQueue([watcher = watcher_, filter = std::move(filter), client = processIdentifier_](
-                             auto& service, const Reply& answer, RequestToken&) mutable {
+                             auto& service, const Reply& answer, InFlightToken&) mutable {
         infoLog(TWReportingServiceDelegateCategory(), "client %i watches messages", client);
         watcher->open(std::move(filter));
         service.messageWatch().add(watcher);
@@ -92,7 +92,7 @@ void WatchExport::handleRequest(std::size_t method, Arguments arguments, Reply r
       });
     }
     case kNextMessages:
-      return onWorkQueue([watcher = watcher_](auto&, const Reply& answer, RequestToken& held) {
+      return onWorkQueue([watcher = watcher_](auto&, const Reply& answer, InFlightToken& held) {
         if (watcher->isOpen()) return watcher->next(answer, std::move(held));
         answer(messagingError(kInvalidArguments, "watch.nextMessages: watch.openMessages comes first"));
       });

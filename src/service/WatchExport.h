@@ -22,7 +22,7 @@ class WatchExport final : public RequestHandler {
   WatchExport& operator=(const WatchExport&) = delete;
   ~WatchExport() override;
 
-  void handleRequest(std::size_t method, Arguments arguments, Reply reply, RequestToken token) override;
+  void handleRequest(std::size_t method, Arguments arguments, Reply reply, InFlightToken token) override;
 
   // Names and parameters of its requests, all for the owner alone.
   static const std::vector<Method>& methods();

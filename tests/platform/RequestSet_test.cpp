@@ -104,7 +104,7 @@ TEST(RequestSetTest, FindsAMethodByItsWholeName) {
   EXPECT_EQ(interface.find(""), std::nullopt);
 }
 
-class CountingGauge final : public RequestGauge {
+class CountingGauge final : public InFlightCounter {
  public:
   void finished(std::size_t size) override {
     ++requests;
@@ -117,9 +117,9 @@ class CountingGauge final : public RequestGauge {
 TEST(RequestTokenTest, FinishesItsRequestOnceWhereverItIsCarried) {
   const auto gauge = std::make_shared<CountingGauge>();
   {
-    RequestToken token(gauge, 10);
-    RequestToken carried = std::move(token);
-    RequestToken other(gauge, 5);
+    InFlightToken token(gauge, 10);
+    InFlightToken carried = std::move(token);
+    InFlightToken other(gauge, 5);
     other = std::move(carried);
     EXPECT_EQ(gauge->requests, 1);  // the one that was assigned over
     EXPECT_EQ(gauge->bytes, 5U);

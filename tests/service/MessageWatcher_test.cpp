@@ -28,7 +28,7 @@ class Answers final : public ReplySink {
 };
 
 // Counts requests that are finished.
-class Gauge final : public RequestGauge {
+class Gauge final : public InFlightCounter {
  public:
   void finished(std::size_t /*bytes*/) override { ++count; }
   int count = 0;
@@ -47,7 +47,7 @@ class MessageWatcherTest : public ReportingTest {
   void offerNumbers(int first, int last) {
     for (int number = first; number <= last; ++number) offer({{"number", number}});
   }
-  void ask() { watcher->next(Reply(answers, 1), RequestToken(gauge, 0)); }
+  void ask() { watcher->next(Reply(answers, 1), InFlightToken(gauge, 0)); }
   // Asks, and takes the answer out; empty when there is none yet.
   ValueMap next() {
     answers->all.clear();

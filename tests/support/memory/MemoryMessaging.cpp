@@ -11,7 +11,7 @@ namespace tonewerk {
 // Both ends of the connection; the client, the listener's delegate and replies under way share it.
 class MemoryClient::Connection final : public MessagingConnection,
                                        public ReplySink,
-                                       public RequestGauge,
+                                       public InFlightCounter,
                                        public std::enable_shared_from_this<Connection> {
  public:
   Connection(std::int32_t processIdentifier, std::uint32_t userIdentifier)
@@ -111,7 +111,7 @@ class MemoryClient::Connection final : public MessagingConnection,
     }
     // Held here, too: the request itself may end the connection.
     const std::shared_ptr<RequestHandler> object = object_;
-    object->handleRequest(*place, std::move(request.arguments), reply, RequestToken(shared_from_this(), 0));
+    object->handleRequest(*place, std::move(request.arguments), reply, InFlightToken(shared_from_this(), 0));
   }
 
   const std::int32_t processIdentifier_;

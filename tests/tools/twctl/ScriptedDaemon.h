@@ -65,7 +65,7 @@ class ScriptedDaemon {
    public:
     explicit Object(ScriptedDaemon& daemon) : daemon_(daemon) {}
     void handleRequest(std::size_t method, Arguments arguments, Reply reply,
-                       RequestToken /*token*/) override {
+                       InFlightToken /*token*/) override {
       daemon_.handle(std::string(TWReportingServiceExport::requestSet().methods[method].name),
                      std::move(arguments), reply);
     }

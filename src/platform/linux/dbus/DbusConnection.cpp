@@ -30,7 +30,7 @@ DbusConnection::DbusConnection(const DbusConnectionContext& context, std::uint64
     : context_(context),
       identifier_(identifier),
       name_(std::move(name)),
-      load_(std::make_shared<RequestLoad>(context.waker, identifier)),
+      load_(std::make_shared<RequestWindow>(context.waker, identifier)),
       outbox_(std::make_shared<DbusOutbox>(context.waker, identifier)) {}
 
 DbusConnection::~DbusConnection() {
@@ -62,7 +62,7 @@ std::optional<ReplyError> DbusConnection::take(sd_bus_message* call, const DbusI
   DbusArguments read = readDbusArguments(call, entry, method, context_.texts);
   if (context_.memory != nullptr) context_.memory->clientBrought(read.wireBytes);
   if (read.problem) return std::move(read.problem);
-  RequestToken token = load_->start(bytesHeldBy(read) + method.replyBytes);
+  InFlightToken token = load_->start(bytesHeldBy(read) + method.replyBytes);
   handOver({entry.place, std::move(read.arguments), replyTo(call, method.result.type), std::move(token)});
   return std::nullopt;
 }

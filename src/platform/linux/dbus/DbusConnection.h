@@ -16,7 +16,7 @@
 #include "platform/linux/dbus/DbusInterface.h"
 #include "platform/linux/dbus/DbusOutbox.h"
 #include "platform/linux/dbus/SdBus.h"
-#include "platform/linux/messaging/RequestLoad.h"
+#include "platform/linux/messaging/RequestWindow.h"
 #include "platform/linux/threads/IoWaker.h"
 
 namespace tonewerk {
@@ -47,7 +47,7 @@ struct DbusPeer {
 //   end()               the name has vanished, or the bus has
 //
 // The bus is shared, so it cannot be left unread for one client alone as a socket can: what goes past the
-// bounds of RequestLoad is refused.
+// bounds of RequestWindow is refused.
 class DbusConnection final : public MessagingConnection {
  public:
   // `context` outlives the connection. `identifier` is its number in the waker.
@@ -84,7 +84,7 @@ class DbusConnection final : public MessagingConnection {
     std::size_t method;
     Arguments arguments;
     Reply reply;
-    RequestToken token;
+    InFlightToken token;
   };
 
   Reply replyTo(sd_bus_message* call, ResultType result);
@@ -108,7 +108,7 @@ class DbusConnection final : public MessagingConnection {
   std::vector<Request> waiting_;  // for the connection to be accepted and resumed
   std::unordered_map<std::uint32_t, Call> calls_;
   std::uint32_t nextCall_ = 0;
-  std::shared_ptr<RequestLoad> load_;
+  std::shared_ptr<RequestWindow> load_;
   std::shared_ptr<DbusOutbox> outbox_;
 };
 

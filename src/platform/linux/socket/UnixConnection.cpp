@@ -42,7 +42,7 @@ UnixConnection::UnixConnection(const UnixConnectionContext& context, std::uint64
       identifier_(identifier),
       socket_(std::move(socket)),
       reader_(context.texts),
-      load_(std::make_shared<RequestLoad>(context.waker, identifier)),
+      load_(std::make_shared<RequestWindow>(context.waker, identifier)),
       outbox_(std::make_shared<ReplyOutbox>(socket_.get(), context.waker, identifier)) {
   ucred peer{};
   socklen_t size = sizeof(peer);
@@ -130,7 +130,7 @@ void UnixConnection::dispatch(RpcFrame& frame) {
   const std::optional<std::size_t> method = interface_->find(frame.method);
   Reply reply = frame.kind == RpcFrame::Kind::kRequest ? Reply(outbox_, frame.identifier) : Reply();
   if (const auto problem = problemWithFrame(frame, method)) return reply(problem);
-  RequestToken token = load_->start(bytesHeldBy(frame) + interface_->methods[*method].replyBytes);
+  InFlightToken token = load_->start(bytesHeldBy(frame) + interface_->methods[*method].replyBytes);
   object_->handleRequest(*method, std::move(frame.arguments), std::move(reply), std::move(token));
 }
 

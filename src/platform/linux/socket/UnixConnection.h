@@ -15,7 +15,7 @@
 #include "platform/linux/files/Epoll.h"
 #include "platform/linux/files/FileDescriptor.h"
 #include "platform/linux/messagepack/RpcFrameReader.h"
-#include "platform/linux/messaging/RequestLoad.h"
+#include "platform/linux/messaging/RequestWindow.h"
 #include "platform/linux/socket/ReplyOutbox.h"
 #include "platform/linux/threads/IoWaker.h"
 
@@ -87,7 +87,7 @@ class UnixConnection final : public MessagingConnection {
   bool hasEnded_ = false;
 
   RpcFrameReader reader_;
-  std::shared_ptr<RequestLoad> load_;
+  std::shared_ptr<RequestWindow> load_;
   bool isPaused_ = false;
   std::string rest_;
 

@@ -67,7 +67,7 @@ class RecordingDaemon final : private MessagingListenerDelegate {
   class Object final : public RequestHandler {
    public:
     explicit Object(RecordingDaemon& daemon) : daemon_(daemon) {}
-    void handleRequest(std::size_t method, Arguments arguments, Reply reply, RequestToken) override {
+    void handleRequest(std::size_t method, Arguments arguments, Reply reply, InFlightToken) override {
       daemon_.handle(method, std::move(arguments), reply);
     }
 

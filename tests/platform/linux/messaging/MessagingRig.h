@@ -62,7 +62,7 @@ class MessagingRecord {
     requests_.push_back(std::move(request));
     changed_.notify_all();
   }
-  void hold(Reply reply, RequestToken token) {
+  void hold(Reply reply, InFlightToken token) {
     const std::lock_guard lock(mutex_);
     held_.emplace_back(std::move(reply), std::move(token));
     changed_.notify_all();
@@ -81,7 +81,7 @@ class MessagingRecord {
     return held_.size();
   }
   // Takes out what methods that hold have kept.
-  std::vector<std::pair<Reply, RequestToken>> takeHeld() {
+  std::vector<std::pair<Reply, InFlightToken>> takeHeld() {
     const std::lock_guard lock(mutex_);
     return std::exchange(held_, {});
   }
@@ -107,7 +107,7 @@ class MessagingRecord {
   // Under mutex_.
   std::vector<std::string> events_;
   std::vector<ReceivedRequest> requests_;
-  std::vector<std::pair<Reply, RequestToken>> held_;
+  std::vector<std::pair<Reply, InFlightToken>> held_;
 };
 
 class RigObject final : public RequestHandler {
@@ -117,7 +117,7 @@ class RigObject final : public RequestHandler {
   RigObject& operator=(const RigObject&) = delete;
   ~RigObject() override { record_.add("object gone"); }
 
-  void handleRequest(std::size_t method, Arguments arguments, Reply reply, RequestToken token) override {
+  void handleRequest(std::size_t method, Arguments arguments, Reply reply, InFlightToken token) override {
     const std::string name(rigInterface().methods[method].name);
     const Argument first = arguments.empty() ? Argument() : arguments.front();
     record_.add(ReceivedRequest{name, std::move(arguments)});
@@ -125,7 +125,7 @@ class RigObject final : public RequestHandler {
     if (name == "fail") return reply(ReplyError{"com.example", 7, ""});
     if (name == "hold" || name == "holdMap" || name == "holdLarge")
       return record_.hold(std::move(reply), std::move(token));
-    if (name == "holdReply") return record_.hold(std::move(reply), RequestToken());
+    if (name == "holdReply") return record_.hold(std::move(reply), InFlightToken());
     if (name != "answerTwice") return reply(std::nullopt);
     reply(std::nullopt, Value(1));
     reply(std::nullopt, Value(2));

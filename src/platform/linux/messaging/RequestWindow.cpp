@@ -1,28 +1,28 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "platform/linux/messaging/RequestLoad.h"
+#include "platform/linux/messaging/RequestWindow.h"
 
 #include "platform/linux/messagepack/RpcLimits.h"
 
 namespace tonewerk {
 
-void RequestLoad::finished(std::size_t bytes) {
+void RequestWindow::finished(std::size_t bytes) {
   finishedBytes_.fetch_add(bytes);
   // In one total order with hasRoom(): either this sees what the I/O thread waits for, or that sees this.
   if (finishedRequests_.fetch_add(1) + 1 == wakeAt_.load()) waker_->wake(connection_);
 }
 
-RequestToken RequestLoad::start(std::size_t bytes) {
+InFlightToken RequestWindow::start(std::size_t bytes) {
   ++startedRequests_;
   startedBytes_ += bytes;
   return {shared_from_this(), bytes};
 }
 
-bool RequestLoad::isBelowBound(std::size_t otherBytes) const {
+bool RequestWindow::isBelowBound(std::size_t otherBytes) const {
   return startedRequests_ - knownFinishedRequests_ < kMostUnfinishedRequests &&
          startedBytes_ - knownFinishedBytes_ + otherBytes < kMostUnfinishedBytes;
 }
 
-bool RequestLoad::hasRoom(std::size_t otherBytes) {
+bool RequestWindow::hasRoom(std::size_t otherBytes) {
   while (!isBelowBound(otherBytes)) {
     knownFinishedRequests_ = finishedRequests_.load();
     knownFinishedBytes_ = finishedBytes_.load();

@@ -16,16 +16,16 @@ namespace tonewerk {
 //
 // The I/O thread counts what it starts, whoever finishes a request counts that; so the I/O thread only looks
 // at the others' counters when its own idea of them says that the bound is reached.
-class RequestLoad final : public RequestGauge, public std::enable_shared_from_this<RequestLoad> {
+class RequestWindow final : public InFlightCounter, public std::enable_shared_from_this<RequestWindow> {
  public:
-  RequestLoad(std::shared_ptr<IoWaker> waker, std::uint64_t connection)
+  RequestWindow(std::shared_ptr<IoWaker> waker, std::uint64_t connection)
       : waker_(std::move(waker)), connection_(connection) {}
 
   // Any thread.
   void finished(std::size_t bytes) override;
 
   // The I/O thread: a request begins, and has ended when the token is gone.
-  RequestToken start(std::size_t bytes);
+  InFlightToken start(std::size_t bytes);
 
   // The I/O thread: whether there is room for another request beside `otherBytes` that the connection holds.
   // When there is none, the connection is woken once half of the requests under way have finished: not for

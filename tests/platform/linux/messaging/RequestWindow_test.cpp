@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "platform/linux/messaging/RequestLoad.h"
+#include "platform/linux/messaging/RequestWindow.h"
 
 #include <gmock/gmock.h>
 #include <memory>
@@ -16,51 +16,51 @@ using testing::IsEmpty;
 
 constexpr std::uint64_t kConnection = 9;
 
-class RequestLoadTest : public testing::Test {
+class RequestWindowTest : public testing::Test {
  protected:
-  std::vector<RequestToken> start(std::size_t count, std::size_t bytes) {
-    std::vector<RequestToken> tokens;
+  std::vector<InFlightToken> start(std::size_t count, std::size_t bytes) {
+    std::vector<InFlightToken> tokens;
     for (std::size_t at = 0; at < count; ++at) tokens.push_back(load->start(bytes));
     return tokens;
   }
 
   std::shared_ptr<IoWaker> waker = std::make_shared<IoWaker>();
-  std::shared_ptr<RequestLoad> load = std::make_shared<RequestLoad>(waker, kConnection);
+  std::shared_ptr<RequestWindow> load = std::make_shared<RequestWindow>(waker, kConnection);
 };
 
-TEST_F(RequestLoadTest, HasRoomUntilTheBoundOfRequestsIsReached) {
+TEST_F(RequestWindowTest, HasRoomUntilTheBoundOfRequestsIsReached) {
   auto tokens = start(kMostUnfinishedRequests - 1, 1);
   EXPECT_TRUE(load->hasRoom(0));
   tokens.push_back(load->start(1));
   EXPECT_FALSE(load->hasRoom(0));
 }
 
-TEST_F(RequestLoadTest, HasRoomUntilTheBoundOfBytesIsReached) {
+TEST_F(RequestWindowTest, HasRoomUntilTheBoundOfBytesIsReached) {
   auto tokens = start(1, kMostUnfinishedBytes - 1);
   EXPECT_TRUE(load->hasRoom(0));
   tokens.push_back(load->start(1));
   EXPECT_FALSE(load->hasRoom(0));
 }
 
-TEST_F(RequestLoadTest, CountsTheBytesOfUnreadRepliesToo) {
+TEST_F(RequestWindowTest, CountsTheBytesOfUnreadRepliesToo) {
   const auto tokens = start(1, 1000);
   EXPECT_TRUE(load->hasRoom(kMostUnfinishedBytes - 1001));
   EXPECT_FALSE(load->hasRoom(kMostUnfinishedBytes - 1000));
 }
 
-TEST_F(RequestLoadTest, HasNoRoomForRepliesAloneEither) {
+TEST_F(RequestWindowTest, HasNoRoomForRepliesAloneEither) {
   EXPECT_TRUE(load->hasRoom(kMostUnfinishedBytes - 1));
   EXPECT_FALSE(load->hasRoom(kMostUnfinishedBytes));
 }
 
-TEST_F(RequestLoadTest, SeesWhatHasFinishedWithoutBeingWoken) {
+TEST_F(RequestWindowTest, SeesWhatHasFinishedWithoutBeingWoken) {
   auto tokens = start(kMostUnfinishedRequests, 1);
   tokens.clear();
   EXPECT_TRUE(load->hasRoom(0));
   EXPECT_THAT(waker->take(), IsEmpty());
 }
 
-TEST_F(RequestLoadTest, WakesTheConnectionOnceWhenHalfHasFinished) {
+TEST_F(RequestWindowTest, WakesTheConnectionOnceWhenHalfHasFinished) {
   auto tokens = start(kMostUnfinishedRequests, 1);
   ASSERT_FALSE(load->hasRoom(0));
   tokens.resize(kMostUnfinishedRequests / 2 + 1);
@@ -72,7 +72,7 @@ TEST_F(RequestLoadTest, WakesTheConnectionOnceWhenHalfHasFinished) {
   EXPECT_THAT(waker->take(), IsEmpty());
 }
 
-TEST_F(RequestLoadTest, WakesTheConnectionForASingleLargeRequest) {
+TEST_F(RequestWindowTest, WakesTheConnectionForASingleLargeRequest) {
   auto tokens = start(1, kMostUnfinishedBytes);
   ASSERT_FALSE(load->hasRoom(0));
   tokens.clear();
@@ -82,7 +82,7 @@ TEST_F(RequestLoadTest, WakesTheConnectionForASingleLargeRequest) {
 
 // A finish that fell between the look at the counters and the wish to be woken once must not be lost, or the
 // connection would never be read from again.
-TEST_F(RequestLoadTest, NeverMissesTheLastFinishOnAnotherThread) {
+TEST_F(RequestWindowTest, NeverMissesTheLastFinishOnAnotherThread) {
   for (int round = 0; round < 300; ++round) {
     auto tokens = start(kMostUnfinishedRequests, 1);
     std::thread finisher([tokens = std::move(tokens)]() mutable { tokens.clear(); });
