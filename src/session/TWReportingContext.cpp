@@ -7,7 +7,7 @@
 #include "platform/DeviceFacts.h"
 #include "platform/LogLine.h"
 #include "session/TWReportingUtility.h"
-#include "session/WorkQueueGate.h"
+#include "session/WeakQueueRef.h"
 
 namespace tonewerk {
 namespace {
@@ -58,12 +58,12 @@ SerialQueue& TWReportingContext::reportingServerQueue() {
   std::call_once(reportingServerQueueOnce_, [this] {
     reportingServerQueue_ = platform_.queues.makeSerialQueue("com.orvane.tonewerk.reporting.server",
                                                              QueuePriority::kUserInteractive);
-    reportingServerQueueGate_ = std::make_shared<WorkQueueGate>(*reportingServerQueue_);
+    reportingServerQueueGate_ = std::make_shared<WeakQueueRef>(*reportingServerQueue_);
   });
   return *reportingServerQueue_;
 }
 
-std::shared_ptr<WorkQueueGate> TWReportingContext::reportingServerQueueGate() {
+std::shared_ptr<WeakQueueRef> TWReportingContext::reportingServerQueueGate() {
   reportingServerQueue();
   return reportingServerQueueGate_;
 }
@@ -81,9 +81,9 @@ SinkQueue& TWReportingContext::fileSinkQueue() {
   return *fileSinkQueue_;
 }
 
-PrivateQueues& TWReportingContext::linkReportQueues() {
+StrandPool& TWReportingContext::linkReportQueues() {
   std::call_once(linkReportQueuesOnce_, [this] {
-    linkReportQueues_ = std::make_unique<PrivateQueues>(
+    linkReportQueues_ = std::make_unique<StrandPool>(
         platform_.queues.makeSerialQueue("com.orvane.tonewerk.session.linkreport", QueuePriority::kUtility));
   });
   return *linkReportQueues_;

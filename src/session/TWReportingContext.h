@@ -12,15 +12,15 @@
 #include "platform/Platform.h"
 #include "platform/SerialQueue.h"
 #include "session/AudioEvent.h"
-#include "session/PrivateQueues.h"
-#include "session/ProcessSingles.h"
+#include "session/SingletonRegistry.h"
 #include "session/SinkQueue.h"
+#include "session/StrandPool.h"
 #include "session/TWReportingNameTable.h"
 #include "session/TWReportingSessionWorkerRegistry.h"
 
 namespace tonewerk {
 
-class WorkQueueGate;
+class WeakQueueRef;
 
 // Everything of which there is one in the process: the platform's services, the work queue, the log
 // categories, the worker registry, the lookup tables, the internal-build answer. The entry point makes one
@@ -46,13 +46,13 @@ class TWReportingContext {
   SerialQueue& reportingServerQueue();
 
   // The way onto it for what may come when it is gone. Closes before the queue ends.
-  std::shared_ptr<WorkQueueGate> reportingServerQueueGate();
+  std::shared_ptr<WeakQueueRef> reportingServerQueueGate();
 
   // Where sinks that write files do so, so that the work queue does not wait for a disk. Made on first use.
   SinkQueue& fileSinkQueue();
 
   // Where sessions' workers use the real-time-communication reporting service. Made on first use.
-  PrivateQueues& linkReportQueues();
+  StrandPool& linkReportQueues();
 
   // Asked of the device once.
   bool isInternalBuild();
@@ -61,7 +61,7 @@ class TWReportingContext {
   const TWReportingSessionWorkerRegistry& workerRegistry();
 
   // What rooms above this one have one of. Ends after the queues made here.
-  ProcessSingles& singles() { return singles_; }
+  SingletonRegistry& singles() { return singles_; }
 
   // On the work queue.
   TWReportingNameTable& names() { return names_; }
@@ -90,7 +90,7 @@ class TWReportingContext {
  private:
   const Platform platform_;
   TWReportingNameTable names_;
-  ProcessSingles singles_;
+  SingletonRegistry singles_;
 
   std::once_flag internalBuildOnce_;
   bool isInternalBuild_ = false;
@@ -111,10 +111,10 @@ class TWReportingContext {
   std::once_flag fileSinkQueueOnce_;
   std::unique_ptr<SinkQueue> fileSinkQueue_;
   std::once_flag linkReportQueuesOnce_;
-  std::unique_ptr<PrivateQueues> linkReportQueues_;
+  std::unique_ptr<StrandPool> linkReportQueues_;
   std::once_flag reportingServerQueueOnce_;
   std::unique_ptr<SerialQueue> reportingServerQueue_;
-  std::shared_ptr<WorkQueueGate> reportingServerQueueGate_;  // made with the queue
+  std::shared_ptr<WeakQueueRef> reportingServerQueueGate_;  // made with the queue
 };
 
 }  // namespace tonewerk

@@ -5,7 +5,7 @@
 
 #include "session/TWReportingContext.h"
 #include "session/TWReportingUtility.h"
-#include "session/WorkQueueGate.h"
+#include "session/WeakQueueRef.h"
 #include "workers/diagnostics/TWReportingSessionCapsaWorker.h"
 #include "workers/diagnostics/WorkerInstanceState.h"
 

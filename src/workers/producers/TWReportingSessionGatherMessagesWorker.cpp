@@ -8,14 +8,14 @@
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingUtility.h"
-#include "workers/producers/StretchSummaries.h"
+#include "workers/producers/IntervalSummaries.h"
 #include "workers/sinks/TWReportingSessionMetriconWorker.h"
 #include "workers/sinks/TWReportingSessionSummaryJsonFileWorker.h"
 
 namespace tonewerk {
 namespace {
 
-constexpr StretchSummaries::Words kWords{"createGatherMessages", "gather", "playingTime"};
+constexpr IntervalSummaries::Words kWords{"createGatherMessages", "gather", "playingTime"};
 
 ValueMap defaultState() {
   return {{TWReportingMessageKeySelectedFormat, "unknown"},
@@ -40,11 +40,11 @@ class Walk {
       : state_(defaultState()), summaries_(kWords, minimumPlaytime) {
     state_.merge(previousValues);
     isPlaying_ = state_.boolean(TWReportingMessageKeySessionOutputRunning);
-    if (isPlaying_) stretchStart_ = StretchSummaries::timestampOf(state_);
+    if (isPlaying_) stretchStart_ = IntervalSummaries::timestampOf(state_);
   }
 
   void step(const ValueMap& message) {
-    const std::optional<Value> timestamp = StretchSummaries::timestampOf(message);
+    const std::optional<Value> timestamp = IntervalSummaries::timestampOf(message);
     const bool wasPlaying = state_.boolean(TWReportingMessageKeySessionOutputRunning);
     bool closes = message.contains(TWReportingMessageKeySessionDuration);
     if (const Value* running = message.find(TWReportingMessageKeySessionOutputRunning)) {
@@ -92,16 +92,16 @@ class Walk {
     return {{TWReportingMessageKeySelectedFormat, carried(TWReportingMessageKeySelectedFormat)},
             {TWReportingMessageKeyFormatID, carried(TWReportingMessageKeyFormatID)},
             {TWReportingMessageKeyActiveDevices, carried(TWReportingMessageKeyActiveDevices)},
-            {TWReportingMessageKeyPlayseconds, StretchSummaries::seconds(playingTime)},
+            {TWReportingMessageKeyPlayseconds, IntervalSummaries::seconds(playingTime)},
             {TWReportingMessageKeyChannelsPerFrame, carried(TWReportingMessageKeyChannelsPerFrame)},
-            {TWReportingMessageKeyPlaysecondsBucketed, StretchSummaries::bucketedSeconds(playingTime)},
+            {TWReportingMessageKeyPlaysecondsBucketed, IntervalSummaries::bucketedSeconds(playingTime)},
             {TWReportingMessageKeyMessageIndex, summaries_.nextIndex()}};
   }
 
   ValueMap state_;  // the latest value of every key
   bool isPlaying_ = false;
   std::optional<Value> stretchStart_;
-  StretchSummaries summaries_;
+  IntervalSummaries summaries_;
 };
 
 }  // namespace

@@ -12,7 +12,7 @@
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionWorkerUtility.h"
 #include "session/TWReportingUtility.h"
-#include "workers/producers/StretchSummaries.h"
+#include "workers/producers/IntervalSummaries.h"
 
 namespace tonewerk {
 namespace {
@@ -20,7 +20,7 @@ namespace {
 constexpr std::array<std::string_view, 2> kKeysToCombine{TWReportingMessageKeySpatialAudioAccessoryFeature,
                                                          TWReportingMessageKeySpatializationEnabled};
 constexpr double kMostPauseSeconds = 2.0;  // less than for volume summaries, on purpose
-constexpr StretchSummaries::Words kWords{"createInputMessages", "input", "runningTime"};
+constexpr IntervalSummaries::Words kWords{"createInputMessages", "input", "runningTime"};
 
 // A sample rate below 1: no vocoder runs.
 constexpr std::string_view kNoRate = "0.";
@@ -55,7 +55,7 @@ class Walk {
   }
 
   void step(const ValueMap& message) {
-    const std::optional<Value> timestamp = StretchSummaries::timestampOf(message);
+    const std::optional<Value> timestamp = IntervalSummaries::timestampOf(message);
     const bool wasRunning = state_.boolean(TWReportingMessageKeySessionInputRunning);
     const bool isLast = message.contains(TWReportingMessageKeySessionDuration);
     bool changed = isLast;
@@ -104,8 +104,8 @@ class Walk {
     const auto carried = [this](std::string_view key) { return *state_.find(key); };
     ValueMap summary{
         {TWReportingApplicationName, *process_},
-        {TWReportingMessageKeyInputrunningSeconds, StretchSummaries::seconds(runningTime)},
-        {TWReportingMessageKeyInputrunningSecondsBucketed, StretchSummaries::bucketedSeconds(runningTime)},
+        {TWReportingMessageKeyInputrunningSeconds, IntervalSummaries::seconds(runningTime)},
+        {TWReportingMessageKeyInputrunningSecondsBucketed, IntervalSummaries::bucketedSeconds(runningTime)},
         {TWReportingMessageKeyMessageIndex, summaries_.nextIndex()},
         {TWReportingMessageKeyVpConfigOperationMode, carried(TWReportingMessageKeyVpConfigOperationMode)},
         {TWReportingMessageKeyVpConfigInputPort, carried(TWReportingMessageKeyVpConfigInputPort)},
@@ -119,7 +119,7 @@ class Walk {
   bool isRunning_ = false;
   std::optional<Value> stretchStart_;
   std::set<std::string> vocoders_;  // changed to since the last summary, each as "name:rate"
-  StretchSummaries summaries_;
+  IntervalSummaries summaries_;
 };
 
 }  // namespace

@@ -10,7 +10,7 @@
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionWorkerUtility.h"
 #include "session/TWReportingUtility.h"
-#include "workers/producers/StretchSummaries.h"
+#include "workers/producers/IntervalSummaries.h"
 
 namespace tonewerk {
 namespace {
@@ -18,7 +18,7 @@ namespace {
 constexpr std::array<std::string_view, 2> kKeysToCombine{TWReportingMessageKeySpatialAudioAccessoryFeature,
                                                          TWReportingMessageKeySpatializationEnabled};
 constexpr double kMostPauseSeconds = 5.0;
-constexpr StretchSummaries::Words kWords{"createVolumeMessages", "volume", "playingTime"};
+constexpr IntervalSummaries::Words kWords{"createVolumeMessages", "volume", "playingTime"};
 
 ValueMap defaultState() {
   return {{TWReportingMessageKeySelectedFormat, "unknown"},
@@ -60,12 +60,12 @@ class Walk {
     if (!isPlaying_) return;
     // A stretch that the previous values show as open yields no summary by itself: without the key, the first
     // message finds no output running.
-    stretchStart_ = StretchSummaries::timestampOf(state_);
+    stretchStart_ = IntervalSummaries::timestampOf(state_);
     state_.erase(TWReportingMessageKeySessionOutputRunning);
   }
 
   void step(const ValueMap& message) {
-    const std::optional<Value> timestamp = StretchSummaries::timestampOf(message);
+    const std::optional<Value> timestamp = IntervalSummaries::timestampOf(message);
     const bool wasPlaying = state_.boolean(TWReportingMessageKeySessionOutputRunning);
     const bool isLast = message.contains(TWReportingMessageKeySessionDuration);
     bool changed = isLast;
@@ -109,13 +109,13 @@ class Walk {
              TWReportingUtilityBucketNumberToString(volume.number(),
                                                     TWReportingUtilityBucketNumberToStringVolumes, 4)
                  .value_or("")},
-            {TWReportingMessageKeyPlayseconds, StretchSummaries::seconds(playingTime)},
+            {TWReportingMessageKeyPlayseconds, IntervalSummaries::seconds(playingTime)},
             {TWReportingMessageKeySpatialAudioAccessoryFeature,
              carried(TWReportingMessageKeySpatialAudioAccessoryFeature)},
             {TWReportingMessageKeySpatializationEnabled, carried(TWReportingMessageKeySpatializationEnabled)},
             {TWReportingMessageKeyRingerState, carried(TWReportingMessageKeyRingerState)},
             {TWReportingMessageKeyChannelsPerFrame, carried(TWReportingMessageKeyChannelsPerFrame)},
-            {TWReportingMessageKeyPlaysecondsBucketed, StretchSummaries::bucketedSeconds(playingTime)},
+            {TWReportingMessageKeyPlaysecondsBucketed, IntervalSummaries::bucketedSeconds(playingTime)},
             {TWReportingMessageKeyMessageIndex, summaries_.nextIndex()}};
   }
 
@@ -123,7 +123,7 @@ class Walk {
   ValueMap state_;  // the latest value of every key
   bool isPlaying_ = false;
   std::optional<Value> stretchStart_;
-  StretchSummaries summaries_;
+  IntervalSummaries summaries_;
 };
 
 }  // namespace

@@ -6,7 +6,7 @@
 
 #include "platform/LogLine.h"
 #include "platform/TimerService.h"
-#include "session/PrivateQueues.h"
+#include "session/StrandPool.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingUtility.h"
@@ -23,7 +23,7 @@ constexpr std::string_view kSessionIdentifierKey = "TWReportingSessionID";
 
 }  // namespace
 
-RtcReporter::RtcReporter(std::shared_ptr<PrivateQueue> queue) : queue_(std::move(queue)) {}
+RtcReporter::RtcReporter(std::shared_ptr<Strand> queue) : queue_(std::move(queue)) {}
 
 RtcReporter::~RtcReporter() = default;
 

@@ -13,7 +13,7 @@
 
 namespace tonewerk {
 
-class PrivateQueue;
+class Strand;
 class Timer;
 
 // What a real-time-communication worker does on its private queue: it alone touches the service's session.
@@ -36,7 +36,7 @@ class RtcReporter : public std::enable_shared_from_this<RtcReporter> {
     bool isSingleMessageSession = false;
   };
 
-  explicit RtcReporter(std::shared_ptr<PrivateQueue> queue);
+  explicit RtcReporter(std::shared_ptr<Strand> queue);
   ~RtcReporter();
 
   // All on the queue.
@@ -57,7 +57,7 @@ class RtcReporter : public std::enable_shared_from_this<RtcReporter> {
   void goOn();
   void sendMessage(TWReportingSessionMessage& message);
 
-  const std::shared_ptr<PrivateQueue> queue_;
+  const std::shared_ptr<Strand> queue_;
   bool linkReportSessionStarted_ = false;
   std::unique_ptr<LinkReportSession> linkReportSession_;
   std::optional<std::string> linkReportAgentToken_;

@@ -3,7 +3,7 @@
 
 #include <utility>
 
-#include "session/PrivateQueues.h"
+#include "session/StrandPool.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingSession.h"
 #include "workers/sinks/RtcReporter.h"

@@ -9,7 +9,7 @@
 
 namespace tonewerk {
 
-class PrivateQueue;
+class Strand;
 class RtcReporter;
 
 // Forwards a session's messages to the real-time-communication reporting service as they arrive, and when the
@@ -42,7 +42,7 @@ class TWReportingSessionRtcWorker final : public TWReportingSessionWorkerConsume
  private:
   void makeQueueOnFirstUse();
 
-  std::shared_ptr<PrivateQueue> linkReportQueue_;
+  std::shared_ptr<Strand> linkReportQueue_;
   std::shared_ptr<RtcReporter> reporter_;  // shared with the queue's work
 };
 

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "session/ProcessSingles.h"
+#include "session/SingletonRegistry.h"
 
 #include <gmock/gmock.h>
 #include <string>
@@ -19,36 +19,36 @@ struct First {
 };
 
 struct Second {
-  explicit Second(ProcessSingles& singles) : value(singles.get<First>(5).value + 1) {}
+  explicit Second(SingletonRegistry& singles) : value(singles.get<First>(5).value + 1) {}
   ~Second() { ends.emplace_back("second"); }
   int value;
 };
 
-TEST(ProcessSinglesTest, MakesEachOnceAndGivesTheSameAgain) {
-  ProcessSingles singles;
+TEST(SingletonRegistryTest, MakesEachOnceAndGivesTheSameAgain) {
+  SingletonRegistry singles;
   First& first = singles.get<First>(1);
   EXPECT_EQ(&singles.get<First>(2), &first);
   EXPECT_EQ(first.value, 1);
 }
 
-TEST(ProcessSinglesTest, FindsNothingBeforeItWasAskedFor) {
-  ProcessSingles singles;
+TEST(SingletonRegistryTest, FindsNothingBeforeItWasAskedFor) {
+  SingletonRegistry singles;
   EXPECT_EQ(singles.find<First>(), nullptr);
   First& first = singles.get<First>(1);
   EXPECT_EQ(singles.find<First>(), &first);
 }
 
-TEST(ProcessSinglesTest, OneMayNeedAnotherAndEndsBeforeIt) {
+TEST(SingletonRegistryTest, OneMayNeedAnotherAndEndsBeforeIt) {
   ends.clear();
   {
-    ProcessSingles singles;
+    SingletonRegistry singles;
     EXPECT_EQ(singles.get<Second>(singles).value, 6);
   }
   EXPECT_THAT(ends, ElementsAre("second", "first"));
 }
 
-TEST(ProcessSinglesTest, ThreadsThatAskTogetherGetTheSame) {
-  ProcessSingles singles;
+TEST(SingletonRegistryTest, ThreadsThatAskTogetherGetTheSame) {
+  SingletonRegistry singles;
   First* seen[2] = {};
   std::thread one([&] { seen[0] = &singles.get<First>(1); });
   std::thread other([&] { seen[1] = &singles.get<First>(2); });

@@ -1,18 +1,18 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "session/ProcessSingles.h"
+#include "session/SingletonRegistry.h"
 
 namespace tonewerk {
 
-ProcessSingles::~ProcessSingles() {
+SingletonRegistry::~SingletonRegistry() {
   while (!objects_.empty()) objects_.pop_back();
 }
 
-ProcessSingles::Slot& ProcessSingles::slotOf(std::type_index type) {
+SingletonRegistry::Slot& SingletonRegistry::slotOf(std::type_index type) {
   const std::lock_guard lock(mutex_);
   return slots_[type];
 }
 
-void ProcessSingles::keep(Slot& slot, std::shared_ptr<void> object) {
+void SingletonRegistry::keep(Slot& slot, std::shared_ptr<void> object) {
   const std::lock_guard lock(mutex_);
   slot.object = object.get();
   objects_.push_back(std::move(object));

@@ -10,7 +10,7 @@
 
 namespace tonewerk {
 
-class PrivateQueue;
+class Strand;
 class SinkQueue;
 
 // Serial queues that sessions have for themselves, all on one thread: thousands of sessions do not make
@@ -22,19 +22,19 @@ class SinkQueue;
 //
 // A full thread's queue makes submit() wait, since the thread gets on with it; what is held waits for others,
 // for seconds, and so never holds up who submits.
-class PrivateQueues {
+class StrandPool {
  public:
   // What all queues together hold back.
   static constexpr std::size_t kMostHeldBytes = std::size_t{8} << 20;
 
-  explicit PrivateQueues(std::unique_ptr<SerialQueue> thread);
-  PrivateQueues(const PrivateQueues&) = delete;
-  PrivateQueues& operator=(const PrivateQueues&) = delete;
+  explicit StrandPool(std::unique_ptr<SerialQueue> thread);
+  StrandPool(const StrandPool&) = delete;
+  StrandPool& operator=(const StrandPool&) = delete;
   // Runs what is not held and drops the rest. The queues may live on; they are then without effect.
-  ~PrivateQueues();
+  ~StrandPool();
 
   // Any thread.
-  std::shared_ptr<PrivateQueue> makeQueue();
+  std::shared_ptr<Strand> makeQueue();
 
   // Returns when everything submitted before has run or is held.
   void drain();
@@ -44,7 +44,7 @@ class PrivateQueues {
   std::size_t heldCount() const;
 
  private:
-  friend class PrivateQueue;
+  friend class Strand;
   struct Shared;
 
   const std::shared_ptr<Shared> shared_;
@@ -52,18 +52,18 @@ class PrivateQueues {
 };
 
 // One of them. Lives as long as somebody refers to it, work that it holds included.
-class PrivateQueue : public std::enable_shared_from_this<PrivateQueue> {
+class Strand : public std::enable_shared_from_this<Strand> {
  public:
-  explicit PrivateQueue(std::shared_ptr<PrivateQueues::Shared> shared);
-  PrivateQueue(const PrivateQueue&) = delete;
-  PrivateQueue& operator=(const PrivateQueue&) = delete;
-  ~PrivateQueue();
+  explicit Strand(std::shared_ptr<StrandPool::Shared> shared);
+  Strand(const Strand&) = delete;
+  Strand& operator=(const Strand&) = delete;
+  ~Strand();
 
-  // Any thread but the queues' own, while PrivateQueues lives. Pieces run in the order of their submission.
+  // Any thread but the queues' own, while StrandPool lives. Pieces run in the order of their submission.
   // `bytes`: what `work` keeps.
   void submit(std::size_t bytes, Task work);
 
-  // Any thread; never waits, and does nothing once PrivateQueues is gone. Runs `work` on the thread between
+  // Any thread; never waits, and does nothing once StrandPool is gone. Runs `work` on the thread between
   // two pieces, also while the queue is held: at once from inside one.
   void interrupt(Task work);
 
@@ -77,7 +77,7 @@ class PrivateQueue : public std::enable_shared_from_this<PrivateQueue> {
   std::uint64_t takeDroppedCount();
 
  private:
-  friend class PrivateQueues;
+  friend class StrandPool;
   struct Piece {
     std::size_t bytes = 0;
     Task work;
@@ -86,7 +86,7 @@ class PrivateQueue : public std::enable_shared_from_this<PrivateQueue> {
   void runOrHold(std::size_t bytes, Task work);
   std::deque<Piece> takeHeld();
 
-  const std::shared_ptr<PrivateQueues::Shared> shared_;
+  const std::shared_ptr<StrandPool::Shared> shared_;
   // The thread's own.
   bool isHeld_ = false;
   std::deque<Piece> held_;

@@ -1,11 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "session/WorkQueueGate.h"
+#include "session/WeakQueueRef.h"
 
 #include <utility>
 
 namespace tonewerk {
 
-bool WorkQueueGate::run(Task work) {
+bool WeakQueueRef::run(Task work) {
   {
     const std::lock_guard lock(mutex_);
     if (queue_ == nullptr) return false;
@@ -19,7 +19,7 @@ bool WorkQueueGate::run(Task work) {
   return true;
 }
 
-void WorkQueueGate::close() {
+void WeakQueueRef::close() {
   const std::lock_guard lock(mutex_);
   queue_ = nullptr;
 }

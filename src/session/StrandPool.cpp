@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "session/PrivateQueues.h"
+#include "session/StrandPool.h"
 
 #include <cassert>
 #include <mutex>
@@ -16,15 +16,15 @@ constexpr std::size_t kPieceBytes = 256;
 
 }  // namespace
 
-struct PrivateQueues::Shared {
-  std::mutex mutex;                 // guards all below
-  SinkQueue* thread = nullptr;      // null when it is gone
-  std::set<PrivateQueue*> holding;  // queues that hold pieces
+struct StrandPool::Shared {
+  std::mutex mutex;             // guards all below
+  SinkQueue* thread = nullptr;  // null when it is gone
+  std::set<Strand*> holding;    // queues that hold pieces
   std::size_t heldBytes = 0;
   std::size_t heldCount = 0;
   std::uint64_t droppedCount = 0;
 
-  bool keep(PrivateQueue& queue, std::size_t bytes) {
+  bool keep(Strand& queue, std::size_t bytes) {
     const std::lock_guard lock(mutex);
     if (heldBytes + bytes > kMostHeldBytes) {
       ++droppedCount;
@@ -36,7 +36,7 @@ struct PrivateQueues::Shared {
     return true;
   }
 
-  void give(PrivateQueue& queue, std::size_t bytes, std::size_t count, bool isEmpty) {
+  void give(Strand& queue, std::size_t bytes, std::size_t count, bool isEmpty) {
     const std::lock_guard lock(mutex);
     heldBytes -= bytes;
     heldCount -= count;
@@ -44,12 +44,12 @@ struct PrivateQueues::Shared {
   }
 };
 
-PrivateQueues::PrivateQueues(std::unique_ptr<SerialQueue> thread)
+StrandPool::StrandPool(std::unique_ptr<SerialQueue> thread)
     : shared_(std::make_shared<Shared>()), thread_(std::make_unique<SinkQueue>(std::move(thread))) {
   shared_->thread = thread_.get();
 }
 
-PrivateQueues::~PrivateQueues() {
+StrandPool::~StrandPool() {
   thread_->drain();
   {
     const std::lock_guard lock(shared_->mutex);
@@ -58,7 +58,7 @@ PrivateQueues::~PrivateQueues() {
   thread_.reset();
   // Held pieces refer to whoever refers to their queue, so nobody else lets go of them.
   for (;;) {
-    std::shared_ptr<PrivateQueue> queue;
+    std::shared_ptr<Strand> queue;
     {
       const std::lock_guard lock(shared_->mutex);
       if (shared_->holding.empty()) return;
@@ -69,25 +69,25 @@ PrivateQueues::~PrivateQueues() {
   }
 }
 
-std::shared_ptr<PrivateQueue> PrivateQueues::makeQueue() { return std::make_shared<PrivateQueue>(shared_); }
+std::shared_ptr<Strand> StrandPool::makeQueue() { return std::make_shared<Strand>(shared_); }
 
-void PrivateQueues::drain() { thread_->drain(); }
+void StrandPool::drain() { thread_->drain(); }
 
-std::uint64_t PrivateQueues::droppedCount() const {
+std::uint64_t StrandPool::droppedCount() const {
   const std::lock_guard lock(shared_->mutex);
   return shared_->droppedCount;
 }
 
-std::size_t PrivateQueues::heldCount() const {
+std::size_t StrandPool::heldCount() const {
   const std::lock_guard lock(shared_->mutex);
   return shared_->heldCount;
 }
 
-PrivateQueue::PrivateQueue(std::shared_ptr<PrivateQueues::Shared> shared) : shared_(std::move(shared)) {}
+Strand::Strand(std::shared_ptr<StrandPool::Shared> shared) : shared_(std::move(shared)) {}
 
-PrivateQueue::~PrivateQueue() { takeHeld(); }
+Strand::~Strand() { takeHeld(); }
 
-void PrivateQueue::submit(std::size_t bytes, Task work) {
+void Strand::submit(std::size_t bytes, Task work) {
   SinkQueue* thread = nullptr;
   {
     const std::lock_guard lock(shared_->mutex);
@@ -99,7 +99,7 @@ void PrivateQueue::submit(std::size_t bytes, Task work) {
   });
 }
 
-void PrivateQueue::interrupt(Task work) {
+void Strand::interrupt(Task work) {
   {
     const std::lock_guard lock(shared_->mutex);
     if (shared_->thread == nullptr) return;
@@ -111,9 +111,9 @@ void PrivateQueue::interrupt(Task work) {
   work();
 }
 
-void PrivateQueue::hold() { isHeld_ = true; }
+void Strand::hold() { isHeld_ = true; }
 
-void PrivateQueue::release() {
+void Strand::release() {
   isHeld_ = false;
   while (!isHeld_ && !held_.empty()) {
     const Piece piece = std::move(held_.front());
@@ -123,9 +123,9 @@ void PrivateQueue::release() {
   }
 }
 
-std::uint64_t PrivateQueue::takeDroppedCount() { return std::exchange(droppedCount_, 0); }
+std::uint64_t Strand::takeDroppedCount() { return std::exchange(droppedCount_, 0); }
 
-void PrivateQueue::runOrHold(std::size_t bytes, Task work) {
+void Strand::runOrHold(std::size_t bytes, Task work) {
   if (!isHeld_) {
     work();
   } else if (shared_->keep(*this, bytes + kPieceBytes)) {
@@ -135,7 +135,7 @@ void PrivateQueue::runOrHold(std::size_t bytes, Task work) {
   }
 }
 
-std::deque<PrivateQueue::Piece> PrivateQueue::takeHeld() {
+std::deque<Strand::Piece> Strand::takeHeld() {
   std::deque<Piece> taken = std::move(held_);
   held_.clear();
   std::size_t bytes = 0;

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "session/PrivateQueues.h"
+#include "session/StrandPool.h"
 
 #include <gmock/gmock.h>
 #include <optional>
@@ -10,31 +10,31 @@
 namespace tonewerk {
 namespace {
 
-constexpr std::size_t kMost = PrivateQueues::kMostHeldBytes;
+constexpr std::size_t kMost = StrandPool::kMostHeldBytes;
 
-class PrivateQueuesTest : public ::testing::Test {
+class StrandPoolTest : public ::testing::Test {
  protected:
-  PrivateQueuesTest() {
+  StrandPoolTest() {
     auto owned = std::make_unique<ManualSerialQueue>("thread");
     thread = owned.get();
     queues.emplace(std::move(owned));
     queue = queues->makeQueue();
   }
 
-  void submit(PrivateQueue& to, const std::string& text, std::size_t bytes = 0) {
+  void submit(Strand& to, const std::string& text, std::size_t bytes = 0) {
     to.submit(bytes, [this, text] { ran += text; });
   }
-  void submitHolding(PrivateQueue& to) {
+  void submitHolding(Strand& to) {
     to.submit(0, [&to] { to.hold(); });
   }
 
   std::string ran;
   ManualSerialQueue* thread = nullptr;
-  std::optional<PrivateQueues> queues;
-  std::shared_ptr<PrivateQueue> queue;
+  std::optional<StrandPool> queues;
+  std::shared_ptr<Strand> queue;
 };
 
-TEST_F(PrivateQueuesTest, RunsPiecesInTheOrderOfSubmission) {
+TEST_F(StrandPoolTest, RunsPiecesInTheOrderOfSubmission) {
   const auto other = queues->makeQueue();
   submit(*queue, "a");
   submit(*other, "b");
@@ -44,7 +44,7 @@ TEST_F(PrivateQueuesTest, RunsPiecesInTheOrderOfSubmission) {
   EXPECT_EQ(ran, "abc");
 }
 
-TEST_F(PrivateQueuesTest, HoldsThePiecesBehindTheOneThatWaitsUntilReleased) {
+TEST_F(StrandPoolTest, HoldsThePiecesBehindTheOneThatWaitsUntilReleased) {
   submit(*queue, "a");
   submitHolding(*queue);
   submit(*queue, "b");
@@ -60,7 +60,7 @@ TEST_F(PrivateQueuesTest, HoldsThePiecesBehindTheOneThatWaitsUntilReleased) {
   EXPECT_EQ(queues->heldCount(), 0U);
 }
 
-TEST_F(PrivateQueuesTest, AHeldQueueHoldsUpNoOther) {
+TEST_F(StrandPoolTest, AHeldQueueHoldsUpNoOther) {
   const auto other = queues->makeQueue();
   submitHolding(*queue);
   submit(*queue, "a");
@@ -69,7 +69,7 @@ TEST_F(PrivateQueuesTest, AHeldQueueHoldsUpNoOther) {
   EXPECT_EQ(ran, "b");
 }
 
-TEST_F(PrivateQueuesTest, AReleasedPieceMayHoldAgain) {
+TEST_F(StrandPoolTest, AReleasedPieceMayHoldAgain) {
   submitHolding(*queue);
   submit(*queue, "a");
   submitHolding(*queue);
@@ -82,7 +82,7 @@ TEST_F(PrivateQueuesTest, AReleasedPieceMayHoldAgain) {
   }
 }
 
-TEST_F(PrivateQueuesTest, AnInterruptFromInsideAPieceRunsAtOnce) {
+TEST_F(StrandPoolTest, AnInterruptFromInsideAPieceRunsAtOnce) {
   queue->submit(0, [&] {
     queue->interrupt([&] { ran += "inner"; });
     ran += "outer";
@@ -91,7 +91,7 @@ TEST_F(PrivateQueuesTest, AnInterruptFromInsideAPieceRunsAtOnce) {
   EXPECT_EQ(ran, "innerouter");
 }
 
-TEST_F(PrivateQueuesTest, DropsAndCountsWhatFindsNoRoomWhileHeld) {
+TEST_F(StrandPoolTest, DropsAndCountsWhatFindsNoRoomWhileHeld) {
   submitHolding(*queue);
   submit(*queue, "a", kMost / 2);
   submit(*queue, "b", kMost / 2);
@@ -108,7 +108,7 @@ TEST_F(PrivateQueuesTest, DropsAndCountsWhatFindsNoRoomWhileHeld) {
   EXPECT_EQ(ran, "ac");
 }
 
-TEST_F(PrivateQueuesTest, TheRoomIsSharedAndComesBackWhenAQueueDies) {
+TEST_F(StrandPoolTest, TheRoomIsSharedAndComesBackWhenAQueueDies) {
   auto other = queues->makeQueue();
   submitHolding(*other);
   submit(*other, "x", kMost - 1024);
@@ -125,14 +125,14 @@ TEST_F(PrivateQueuesTest, TheRoomIsSharedAndComesBackWhenAQueueDies) {
   EXPECT_EQ(queues->heldCount(), 1U);
 }
 
-TEST_F(PrivateQueuesTest, EmptyPiecesTakeRoomToo) {
+TEST_F(StrandPoolTest, EmptyPiecesTakeRoomToo) {
   submitHolding(*queue);
   for (std::size_t n = 0; n < kMost / 64; ++n) submit(*queue, "");
   thread->runAll();
   EXPECT_GT(queues->droppedCount(), 0U);
 }
 
-TEST_F(PrivateQueuesTest, AtTheEndRunsWhatIsQueuedAndDropsWhatIsHeld) {
+TEST_F(StrandPoolTest, AtTheEndRunsWhatIsQueuedAndDropsWhatIsHeld) {
   const auto other = queues->makeQueue();
   const auto kept = std::make_shared<int>(0);
   submitHolding(*queue);

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "session/WorkQueueGate.h"
+#include "session/WeakQueueRef.h"
 
 #include <atomic>
 #include <gtest/gtest.h>
@@ -12,9 +12,9 @@
 namespace tonewerk {
 namespace {
 
-TEST(WorkQueueGateTest, WorkOfAnotherThreadWaitsForTheQueue) {
+TEST(WeakQueueRefTest, WorkOfAnotherThreadWaitsForTheQueue) {
   ManualSerialQueue queue("work");
-  WorkQueueGate gate(queue);
+  WeakQueueRef gate(queue);
   bool isDone = false;
   bool wasTaken = false;
   std::thread([&] { wasTaken = gate.run([&] { isDone = true; }); }).join();
@@ -24,9 +24,9 @@ TEST(WorkQueueGateTest, WorkOfAnotherThreadWaitsForTheQueue) {
   EXPECT_TRUE(isDone);
 }
 
-TEST(WorkQueueGateTest, TheQueuesOwnWorkIsServedAtOnceAlsoFromWithin) {
+TEST(WeakQueueRefTest, TheQueuesOwnWorkIsServedAtOnceAlsoFromWithin) {
   ManualSerialQueue queue("work");
-  WorkQueueGate gate(queue);
+  WeakQueueRef gate(queue);
   int depth = 0;
   queue.async([&] {
     gate.run([&] { gate.run([&] { depth = 2; }); });
@@ -36,9 +36,9 @@ TEST(WorkQueueGateTest, TheQueuesOwnWorkIsServedAtOnceAlsoFromWithin) {
   EXPECT_EQ(depth, 2);
 }
 
-TEST(WorkQueueGateTest, NothingComesThroughOnceItIsClosed) {
+TEST(WeakQueueRefTest, NothingComesThroughOnceItIsClosed) {
   ManualSerialQueue queue("work");
-  WorkQueueGate gate(queue);
+  WeakQueueRef gate(queue);
   gate.close();
   bool isDone = false;
   EXPECT_FALSE(gate.run([&] { isDone = true; }));
@@ -46,10 +46,10 @@ TEST(WorkQueueGateTest, NothingComesThroughOnceItIsClosed) {
   EXPECT_FALSE(isDone);
 }
 
-TEST(WorkQueueGateTest, WhatIsTakenWhileTheQueueEndsRunsAndWhatIsNotDoesNot) {
+TEST(WeakQueueRefTest, WhatIsTakenWhileTheQueueEndsRunsAndWhatIsNotDoesNot) {
   for (int round = 0; round < 20; ++round) {
     auto queue = std::make_unique<ManualSerialQueue>("work");
-    WorkQueueGate gate(*queue);
+    WeakQueueRef gate(*queue);
     std::atomic<int> taken = 0;
     std::atomic<int> ran = 0;
     const auto answer = [&] {
@@ -71,7 +71,7 @@ TEST(WorkQueueGateTest, WhatIsTakenWhileTheQueueEndsRunsAndWhatIsNotDoesNot) {
 class ContextGateTest : public ReportingTest {};
 
 TEST_F(ContextGateTest, TheContextsGateLeadsToTheWorkQueueAndClosesWithTheContext) {
-  const std::shared_ptr<WorkQueueGate> gate = context->reportingServerQueueGate();
+  const std::shared_ptr<WeakQueueRef> gate = context->reportingServerQueueGate();
   bool wasOnTheQueue = false;
   gate->run([&] { wasOnTheQueue = context->reportingServerQueue().isCurrent(); });
   test.queues.runAll();

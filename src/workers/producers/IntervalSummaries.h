@@ -22,7 +22,7 @@ namespace tonewerk {
 //   summaries.add(TWReportingSessionCategory(), {..., {"msgidx", summaries.nextIndex()}}, kCategoryVolume);
 //
 // The log lines are the producer's: each call passes the category, and with it its own file and line.
-class StretchSummaries {
+class IntervalSummaries {
  public:
   // The producer's words in the log lines. They outlive the object.
   struct Words {
@@ -32,7 +32,7 @@ class StretchSummaries {
   };
 
   // Stretches of `minimumSeconds` or less are too short.
-  StretchSummaries(const Words& words, double minimumSeconds)
+  IntervalSummaries(const Words& words, double minimumSeconds)
       : words_(words), minimumSeconds_(minimumSeconds) {}
 
   // When the message was sent, as it says; none when it does not.

@@ -16,12 +16,12 @@ namespace tonewerk {
 // last made first.
 //
 // Any thread. Making one may use others, not itself.
-class ProcessSingles {
+class SingletonRegistry {
  public:
-  ProcessSingles() = default;
-  ProcessSingles(const ProcessSingles&) = delete;
-  ProcessSingles& operator=(const ProcessSingles&) = delete;
-  ~ProcessSingles();
+  SingletonRegistry() = default;
+  SingletonRegistry(const SingletonRegistry&) = delete;
+  SingletonRegistry& operator=(const SingletonRegistry&) = delete;
+  ~SingletonRegistry();
 
   // The one T; the first call makes it of `arguments`. Lives as long as this does.
   template <class T, class... Arguments>

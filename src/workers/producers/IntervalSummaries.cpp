@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "workers/producers/StretchSummaries.h"
+#include "workers/producers/IntervalSummaries.h"
 
 #include <memory>
 #include <utility>
@@ -14,13 +14,13 @@ double numberOrZero(const std::optional<Value>& value) { return value ? value->n
 
 }  // namespace
 
-std::optional<Value> StretchSummaries::timestampOf(const ValueMap& message) {
+std::optional<Value> IntervalSummaries::timestampOf(const ValueMap& message) {
   const Value* timestamp = message.find(TWReportingMessageKeyTWTimestamp);
   return timestamp == nullptr ? std::nullopt : std::optional<Value>(*timestamp);
 }
 
-std::optional<double> StretchSummaries::measure(const LogSite& site, const std::optional<Value>& begin,
-                                                const std::optional<Value>& end) const {
+std::optional<double> IntervalSummaries::measure(const LogSite& site, const std::optional<Value>& begin,
+                                                 const std::optional<Value>& end) const {
   const double length = numberOrZero(end) - numberOrZero(begin);
   debugLog(site,
            "%@ { func=%s, %@=%f, twTimestamp=%@, twTimestamp_double=%f, startTwTimestamp=%@, "
@@ -31,20 +31,20 @@ std::optional<double> StretchSummaries::measure(const LogSite& site, const std::
   return isLongEnough ? std::optional<double>(length) : std::nullopt;
 }
 
-Value StretchSummaries::seconds(double length) { return static_cast<double>(static_cast<float>(length)); }
+Value IntervalSummaries::seconds(double length) { return static_cast<double>(static_cast<float>(length)); }
 
-Value StretchSummaries::bucketedSeconds(double length) {
+Value IntervalSummaries::bucketedSeconds(double length) {
   return TWReportingUtilityBucketNumberToString(length, TWReportingUtilityBucketNumberToStringTimes, 0)
       .value_or("");
 }
 
-void StretchSummaries::skip(const LogSite& site) const {
+void IntervalSummaries::skip(const LogSite& site) const {
   debugLog(site, "skipped %@ message, too short { func=%s, action=skip, count=%lu }", words_.subject,
            words_.function, summaries_.size());
 }
 
-TWReportingSessionMessage& StretchSummaries::add(const LogSite& site, ValueMap summary,
-                                                 AudioEventCategory category) {
+TWReportingSessionMessage& IntervalSummaries::add(const LogSite& site, ValueMap summary,
+                                                  AudioEventCategory category) {
   summaries_.push_back(
       std::make_shared<TWReportingSessionMessage>(std::move(summary), category, kTypeSummary));
   debugLog(site, "added %@ message { func=%s, action=add, count=%lu }", words_.subject, words_.function,
@@ -52,7 +52,7 @@ TWReportingSessionMessage& StretchSummaries::add(const LogSite& site, ValueMap s
   return *summaries_.back();
 }
 
-TWReportingSessionMessages StretchSummaries::finish() {
+TWReportingSessionMessages IntervalSummaries::finish() {
   for (const auto& summary : summaries_) {
     summary->message.set(TWReportingMessageKeyMessageCount, summaries_.size());
   }

@@ -12,11 +12,11 @@ namespace tonewerk {
 // gate.
 //
 // Any thread. Lives as long as somebody holds it.
-class WorkQueueGate {
+class WeakQueueRef {
  public:
-  explicit WorkQueueGate(SerialQueue& queue) : queue_(&queue) {}
-  WorkQueueGate(const WorkQueueGate&) = delete;
-  WorkQueueGate& operator=(const WorkQueueGate&) = delete;
+  explicit WeakQueueRef(SerialQueue& queue) : queue_(&queue) {}
+  WeakQueueRef(const WeakQueueRef&) = delete;
+  WeakQueueRef& operator=(const WeakQueueRef&) = delete;
 
   // Runs `work` on the queue: before it returns when it is called from the queue's own work, else later.
   // False when the gate is closed; then `work` does not run. Never waits for the queue.
