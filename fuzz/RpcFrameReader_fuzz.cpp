@@ -57,7 +57,7 @@ void expectRoundTrip(const RpcFrame& frame) {
   std::string written;
   RpcWriter(written).request(frame.identifier, frame.method, frame.arguments);
   if (written.size() > kMostFrameBytes) return;  // a float of four bytes is written as a double of eight
-  RpcTexts texts;
+  RpcStrings texts;
   RpcFrameReader reader(texts);
   std::string_view bytes = written;
   expect(reader.next(bytes) == RpcFrameReader::Result::kFrame);
@@ -82,7 +82,7 @@ void expectSound(const RpcFrame& frame, std::size_t method) {
 }
 
 void read(std::string_view bytes, std::size_t pieceLength, std::size_t method) {
-  RpcTexts texts;
+  RpcStrings texts;
   RpcFrameReader reader(texts);
   while (!bytes.empty()) {
     std::string_view piece = bytes.substr(0, pieceLength);

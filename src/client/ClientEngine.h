@@ -134,7 +134,7 @@ class ClientEngine {
 
   twr_state state_ = TWR_STATE_IDLE;
   ClientSocket socket_;
-  RpcTexts texts_{TextCache(64, 64), TextCache(64, 32)};
+  RpcStrings texts_{StringInterner(64, 64), StringInterner(64, 32)};
   std::optional<RpcFrameReader> reader_;
   bool isReadable_ = false;
   bool awaitsRoom_ = false;  // the kernel takes no more for now

@@ -47,7 +47,7 @@ std::optional<ValueMap> mapOf(const twr_payload& payload) {
   packer.pack_map(payload.entries);
   frame.append(entriesOf(payload));
 
-  RpcTexts texts{TextCache(1, 0), TextCache(1, 0)};
+  RpcStrings texts{StringInterner(1, 0), StringInterner(1, 0)};
   RpcFrameReader reader(texts);
   std::string_view left = frame;
   const bool isFrame = reader.next(left) == RpcFrameReader::Result::kFrame;

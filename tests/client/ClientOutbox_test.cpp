@@ -62,7 +62,7 @@ class ClientOutboxTest : public testing::Test {
   // What has been said, frame by frame.
   std::vector<RpcFrame> framesOf(std::string_view bytes) {
     std::vector<RpcFrame> frames;
-    RpcTexts texts;
+    RpcStrings texts;
     RpcFrameReader reader(texts);
     while (reader.next(bytes) == RpcFrameReader::Result::kFrame) frames.push_back(reader.frame());
     EXPECT_EQ(reader.problem(), "");

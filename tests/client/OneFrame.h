@@ -14,7 +14,7 @@ namespace tonewerk {
 // The one frame that `bytes` are; none when they are anything else.
 inline std::optional<RpcFrame> frameOf(std::string_view bytes) {
   const std::size_t size = bytes.size();
-  RpcTexts texts;
+  RpcStrings texts;
   RpcFrameReader reader(texts);
   if (reader.next(bytes) != RpcFrameReader::Result::kFrame) return std::nullopt;
   if (reader.frame().wireBytes != size) return std::nullopt;

@@ -115,7 +115,7 @@ class ScriptedConnection {
   }
 
   FileDescriptor socket_;
-  RpcTexts texts_;
+  RpcStrings texts_;
   RpcFrameReader reader_{texts_};
   std::string unread_;
   bool hasEnded_ = false;

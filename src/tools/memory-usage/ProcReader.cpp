@@ -11,7 +11,7 @@
 #include <string_view>
 #include <system_error>
 
-#include "platform/linux/files/NamedLines.h"
+#include "platform/linux/files/KeyValueLines.h"
 #include "platform/linux/system/ProcessStat.h"
 
 namespace tonewerk {
@@ -93,7 +93,7 @@ ProcReader::Outcome ProcReader::readProcess(const std::string& number, ProcessUs
   if (const int error = readFile(directory + "/status", text)) {
     return isGone(error) ? Outcome::kGone : Outcome::kUnreadable;
   }
-  const NamedLines status(text);
+  const KeyValueLines status(text);
   const auto numberAt = [&](std::string_view name) { return status.number(name).value_or(0); };
   // Neither a thread of the kernel nor a process that has ended has any.
   if (!status.find("RssAnon")) return Outcome::kWithoutMemory;
@@ -120,7 +120,7 @@ ProcReader::Outcome ProcReader::readProcess(const std::string& number, ProcessUs
 bool ProcReader::readSystem(MemoryUsage& system) const {
   std::string text;
   if (readFile(root_ + "/meminfo", text) != 0) return false;
-  const NamedLines memory(text);
+  const KeyValueLines memory(text);
   const auto numberAt = [&](std::string_view name) { return memory.number(name).value_or(0); };
   if (numberAt("MemTotal") == 0) return false;
   const auto difference = [&](std::string_view whole, std::uint64_t part) {
@@ -141,7 +141,7 @@ void ProcReader::readProcessorTime(MemoryUsage& system) const {
   constexpr std::size_t kWords = 8;
   std::string text;
   if (readFile(root_ + "/stat", text) != 0) return;
-  const auto words = wordsOf(std::string_view(text).substr(0, text.find('\n')));
+  const auto words = splitWhitespace(std::string_view(text).substr(0, text.find('\n')));
   if (words.size() < kWords || words[0] != "cpu") return;
   const auto seconds = [&](std::size_t word) { return secondsOf(words[word], ticksPerSecond_); };
   system.userSeconds = seconds(1) + seconds(2);

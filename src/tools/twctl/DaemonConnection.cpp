@@ -56,7 +56,7 @@ class ResultReader {
   }
 
  private:
-  RpcTexts texts_;
+  RpcStrings texts_;
   std::string frame_;
 };
 

@@ -41,7 +41,7 @@ class RpcClientSocket {
   std::error_code decode(std::string_view bytes);
 
   FileDescriptor socket_;
-  RpcTexts texts_;
+  RpcStrings texts_;
   RpcFrameReader reader_;
   std::deque<RpcFrame> arrived_;
 };

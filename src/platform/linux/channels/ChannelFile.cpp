@@ -177,7 +177,7 @@ bool readChannel(ObjectReader& reader, ChanmeterRecord& record) {
 }
 
 // The parser's words from "line 3, column 7" on, without what was read last, which may be long.
-std::string wordsOf(const std::string& text) {
+std::string positionOf(const std::string& text) {
   const std::size_t begin = std::min(text.find("line "), text.size());
   return text.substr(begin, text.find(';', begin) - begin);
 }
@@ -188,7 +188,7 @@ bool parseJson(std::string_view text, JsonTree& json, ChannelFileProblem& proble
     case JsonTree::Failure::kNone:
       return true;
     case JsonTree::Failure::kNotJson:
-      problem = {kChannelsNotJson, wordsOf(words)};
+      problem = {kChannelsNotJson, positionOf(words)};
       return false;
     case JsonTree::Failure::kNumberOutOfRange:
       problem = {kChannelsOutOfRange, "a number is beyond what a double can hold"};

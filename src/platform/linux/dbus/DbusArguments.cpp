@@ -74,7 +74,7 @@ const char* problemOfText(char kind) {
 // 1 (message) ", and everything read since is worthless.
 class ValueReader {
  public:
-  ValueReader(sd_bus_message* message, RpcTexts& texts) : message_(message), texts_(texts) {}
+  ValueReader(sd_bus_message* message, RpcStrings& texts) : message_(message), texts_(texts) {}
 
   const char* problem() const { return problem_; }
   bool isOverLimit() const { return isOverLimit_; }
@@ -141,7 +141,7 @@ class ValueReader {
     return view;
   }
 
-  SharedString shared(TextCache& cache, std::string_view text) {
+  SharedString shared(StringInterner& cache, std::string_view text) {
     std::optional<SharedString> found = cache.find(text);
     if (!found) malformed();
     return found ? std::move(*found) : SharedString();
@@ -266,7 +266,7 @@ class ValueReader {
   }
 
   sd_bus_message* const message_;
-  RpcTexts& texts_;
+  RpcStrings& texts_;
   std::size_t bytes_ = 0;
   const char* problem_ = nullptr;
   bool isOverLimit_ = false;
@@ -285,7 +285,7 @@ std::string countText(const DbusInterface::Entry& entry, const Method& method) {
 }  // namespace
 
 DbusArguments readDbusArguments(sd_bus_message* call, const DbusInterface::Entry& entry, const Method& method,
-                                RpcTexts& texts) {
+                                RpcStrings& texts) {
   ValueReader reader(call, texts);
   DbusArguments read;
   const auto refuse = [&read](std::int64_t code, std::string message) {

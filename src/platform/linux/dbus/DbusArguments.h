@@ -29,6 +29,6 @@ struct DbusArguments {
 //
 // `texts` are those the bus's thread shares.
 DbusArguments readDbusArguments(sd_bus_message* call, const DbusInterface::Entry& entry, const Method& method,
-                                RpcTexts& texts);
+                                RpcStrings& texts);
 
 }  // namespace tonewerk

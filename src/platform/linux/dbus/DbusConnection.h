@@ -28,7 +28,7 @@ struct DbusConnectionContext {
   const DbusInterface& interface;
   MessagingListenerDelegate& delegate;
   std::shared_ptr<IoWaker> waker;
-  RpcTexts& texts;
+  RpcStrings& texts;
   const LogCategory& log;
   AllocatorReclaimer* memory;  // told of what clients bring, and of their ends; may be null
 };

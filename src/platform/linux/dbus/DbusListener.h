@@ -54,7 +54,7 @@ class DbusListener final : public MessagingListener {
   const std::shared_ptr<IoWaker> waker_ = std::make_shared<IoWaker>();
 
   // The bus's thread's.
-  RpcTexts texts_;
+  RpcStrings texts_;
   std::chrono::milliseconds pause_ = kFirstPause;
   std::optional<DbusService::End> lastEnd_;
 

@@ -22,7 +22,7 @@ void DbusOutbox::add(DbusOutcome outcome) {
     if (isPutOff_) return;
     isPutOff_ = true;
   }
-  if (!WorkBatch::putOff(shared_from_this())) endOfBatch();
+  if (!BatchScope::defer(shared_from_this())) endOfBatch();
 }
 
 void DbusOutbox::endOfBatch() {

@@ -10,8 +10,8 @@
 #include <optional>
 
 #include "platform/RequestSet.h"
+#include "platform/linux/threads/BatchScope.h"
 #include "platform/linux/threads/IoWaker.h"
-#include "platform/linux/threads/WorkBatch.h"
 
 namespace tonewerk {
 
@@ -27,7 +27,7 @@ struct DbusOutcome {
 // client for as long as somebody can still reply; outcomes then go nowhere.
 //
 // The bus's thread is woken once a batch of work.
-class DbusOutbox final : public WorkBatch::Ending, public std::enable_shared_from_this<DbusOutbox> {
+class DbusOutbox final : public BatchScope::Deferred, public std::enable_shared_from_this<DbusOutbox> {
  public:
   // The waker wakes the bus's thread for `client`.
   DbusOutbox(std::shared_ptr<IoWaker> waker, std::uint64_t client)

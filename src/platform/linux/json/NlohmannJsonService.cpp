@@ -168,7 +168,7 @@ std::optional<Value> valueOf(const Json& json, Path& path, std::string& problem)
 }
 
 // The library's words without the name of its exception in brackets.
-std::string wordsOf(const Json::exception& error) {
+std::string messageOf(const Json::exception& error) {
   const std::string text = error.what();
   const std::size_t bracket = text.find("] ");
   return bracket == std::string::npos ? text : text.substr(bracket + 2);
@@ -192,7 +192,7 @@ std::optional<Value> NlohmannJsonService::parse(std::string_view text, std::stri
     Path path;
     return valueOf(json, path, problem);
   } catch (const Json::exception& error) {
-    problem = wordsOf(error);
+    problem = messageOf(error);
     return std::nullopt;
   }
 }

@@ -40,7 +40,7 @@ class FrameParser : public msgpack::parser<FrameParser, NoReferences> {
 
 class RpcFrameReader::Parser {
  public:
-  explicit Parser(RpcTexts& texts) : visitor_(texts), parser_(std::make_unique<FrameParser>(visitor_)) {
+  explicit Parser(RpcStrings& texts) : visitor_(texts), parser_(std::make_unique<FrameParser>(visitor_)) {
     visitor_.init();
   }
 
@@ -110,7 +110,7 @@ class RpcFrameReader::Parser {
   bool hasGrown_ = false;
 };
 
-RpcFrameReader::RpcFrameReader(RpcTexts& texts) : parser_(std::make_unique<Parser>(texts)) {}
+RpcFrameReader::RpcFrameReader(RpcStrings& texts) : parser_(std::make_unique<Parser>(texts)) {}
 
 RpcFrameReader::~RpcFrameReader() = default;
 

@@ -6,14 +6,14 @@
 #include <string_view>
 
 #include "platform/linux/messagepack/RpcFrame.h"
-#include "platform/linux/messagepack/TextCache.h"
+#include "platform/linux/messagepack/StringInterner.h"
 
 namespace tonewerk {
 
 // The texts that all connections of a thread share.
-struct RpcTexts {
-  TextCache keys{1024, 64};
-  TextCache values{1024, 32};
+struct RpcStrings {
+  StringInterner keys{1024, 64};
+  StringInterner values{1024, 32};
 };
 
 // Turns a peer's bytes into frames, however they are cut up on their way.
@@ -29,7 +29,7 @@ class RpcFrameReader {
   enum class Result { kFrame, kNeedsMore, kBroken };
 
   // `texts` outlives the reader.
-  explicit RpcFrameReader(RpcTexts& texts);
+  explicit RpcFrameReader(RpcStrings& texts);
   RpcFrameReader(const RpcFrameReader&) = delete;
   RpcFrameReader& operator=(const RpcFrameReader&) = delete;
   ~RpcFrameReader();

@@ -253,7 +253,7 @@ bool RpcFrameVisitor::setMethod(std::string_view text) {
 
 // A daemon's answer may hold what no client said, such as the name of a process; nobody is to lose a
 // connection over a noncharacter in it.
-std::optional<SharedString> RpcFrameVisitor::sharedText(TextCache& cache, std::string_view text) const {
+std::optional<SharedString> RpcFrameVisitor::sharedText(StringInterner& cache, std::string_view text) const {
   std::optional<SharedString> shared = cache.find(text);
   if (!shared && frame_.kind == RpcFrame::Kind::kResponse && isUtf8(text)) shared.emplace(text);
   return shared;

@@ -20,7 +20,7 @@ namespace tonewerk {
 // false to stop it.
 class RpcFrameVisitor {
  public:
-  explicit RpcFrameVisitor(RpcTexts& texts) : texts_(texts) {}
+  explicit RpcFrameVisitor(RpcStrings& texts) : texts_(texts) {}
 
   RpcFrame& frame() { return frame_; }
   const std::string& problem() const { return problem_; }
@@ -79,11 +79,11 @@ class RpcFrameVisitor {
   bool setMethod(std::string_view text);
   static void putInMap(Container& container, Value value);
   bool putKey(std::string_view text);
-  std::optional<SharedString> sharedText(TextCache& cache, std::string_view text) const;
+  std::optional<SharedString> sharedText(StringInterner& cache, std::string_view text) const;
   // Notes the first value that the protocol does not carry and goes on with a stand-in for it.
   bool refuse(const char* what);
 
-  RpcTexts& texts_;
+  RpcStrings& texts_;
   RpcFrame frame_;
   std::string problem_;
   std::size_t depth_ = 0;

@@ -27,7 +27,7 @@ void ReplyOutbox::reply(std::uint32_t requestIdentifier, const std::optional<Rep
     if (isPutOff_ || state_ == State::kFull) return;  // somebody is about to send, or waits to
     isPutOff_ = true;
   }
-  if (!WorkBatch::putOff(shared_from_this())) endOfBatch();
+  if (!BatchScope::defer(shared_from_this())) endOfBatch();
 }
 
 void ReplyOutbox::endOfBatch() {

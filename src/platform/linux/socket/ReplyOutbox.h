@@ -9,8 +9,8 @@
 #include <string>
 
 #include "platform/RequestSet.h"
+#include "platform/linux/threads/BatchScope.h"
 #include "platform/linux/threads/IoWaker.h"
-#include "platform/linux/threads/WorkBatch.h"
 
 namespace tonewerk {
 
@@ -24,7 +24,7 @@ namespace tonewerk {
 //
 // The thread that replies sends, too, because waking another to do it would cost more than the sending.
 class ReplyOutbox final : public ReplySink,
-                          public WorkBatch::Ending,
+                          public BatchScope::Deferred,
                           public std::enable_shared_from_this<ReplyOutbox> {
  public:
   enum class State {

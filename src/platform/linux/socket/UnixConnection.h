@@ -27,7 +27,7 @@ class AllocatorReclaimer;
 struct UnixConnectionContext {
   Epoll& epoll;
   std::shared_ptr<IoWaker> waker;
-  RpcTexts& texts;
+  RpcStrings& texts;
   std::span<char> readBuffer;
   const LogCategory& log;
   std::uint32_t owner;         // who may use what is for the daemon's own user

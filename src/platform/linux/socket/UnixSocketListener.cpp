@@ -12,7 +12,7 @@
 #include <utility>
 
 #include "platform/LogLine.h"
-#include "platform/linux/threads/WorkBatch.h"
+#include "platform/linux/threads/BatchScope.h"
 
 namespace tonewerk {
 namespace {
@@ -62,7 +62,7 @@ void UnixSocketListener::run() {
   epoll_.add(waker_->fileDescriptor(), kWaker, EPOLLIN | EPOLLET);
   infoLog(log_, "listening at %@", socket_->name());
   while (!isStopping_) {
-    const WorkBatch round;
+    const BatchScope round;
     for (const Epoll::Event& event : epoll_.wait(timeToNextRound())) handle(event);
     if (acceptAgainAt_ && std::chrono::steady_clock::now() >= *acceptAgainAt_) resumeAccepting();
     if (watchdog_ != nullptr) watchdog_->pingIfDue();

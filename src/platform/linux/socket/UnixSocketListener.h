@@ -77,7 +77,7 @@ class UnixSocketListener final : public MessagingListener {
   // The messaging thread's.
   Epoll epoll_;
   const std::shared_ptr<IoWaker> waker_ = std::make_shared<IoWaker>();
-  RpcTexts texts_;
+  RpcStrings texts_;
   std::vector<char> readBuffer_;
   const UnixConnectionContext context_;
   const std::unique_ptr<WatchdogFeeder> watchdog_;  // none where nobody watches

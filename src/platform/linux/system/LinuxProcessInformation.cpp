@@ -4,7 +4,7 @@
 #include <ctime>
 #include <unistd.h>
 
-#include "platform/linux/files/NamedLines.h"
+#include "platform/linux/files/KeyValueLines.h"
 #include "platform/linux/files/TextFile.h"
 
 namespace tonewerk {
@@ -29,7 +29,7 @@ std::variant<std::uint64_t, std::string> LinuxProcessInformation::physicalFootpr
   const std::string path = procDirectory_ + "/self/status";
   std::string status;
   if (const std::error_code error = readTextFile(path, status)) return error.message();
-  const NamedLines lines(status);
+  const KeyValueLines lines(status);
   const auto resident = lines.number("RssAnon");
   if (!resident) return "no RssAnon in " + path;
   // Kernels built without swapping have no such line.

@@ -9,7 +9,7 @@
 namespace tonewerk {
 
 // The words of a text, between white space.
-inline std::vector<std::string_view> wordsOf(std::string_view text) {
+inline std::vector<std::string_view> splitWhitespace(std::string_view text) {
   constexpr std::string_view kWhiteSpace = " \t\n";
   std::vector<std::string_view> words;
   for (;;) {
@@ -41,7 +41,8 @@ struct ProcessStat {
     if (opening == std::string_view::npos || closing == std::string_view::npos || closing < opening) {
       return std::nullopt;
     }
-    ProcessStat stat{text.substr(opening + 1, closing - opening - 1), wordsOf(text.substr(closing + 1))};
+    ProcessStat stat{text.substr(opening + 1, closing - opening - 1),
+                     splitWhitespace(text.substr(closing + 1))};
     if (stat.fields.size() < kFields) return std::nullopt;
     return stat;
   }

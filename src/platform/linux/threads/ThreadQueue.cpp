@@ -5,8 +5,8 @@
 #include <future>
 #include <utility>
 
+#include "platform/linux/threads/BatchScope.h"
 #include "platform/linux/threads/ThreadProperties.h"
-#include "platform/linux/threads/WorkBatch.h"
 
 namespace tonewerk {
 namespace {
@@ -57,7 +57,7 @@ void ThreadQueue::run() {
                                                                        : kUtilityNiceness);
   std::vector<Task> batch;
   while (waitForWork(batch)) {
-    WorkBatch together;
+    BatchScope together;
     for (Task& held : batch) {
       {
         const Task work = std::move(held);  // destroyed before the next piece runs

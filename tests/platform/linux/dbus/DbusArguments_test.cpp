@@ -94,7 +94,7 @@ class ReadingEnd {
   }
 
   FileDescriptor writing_;
-  RpcTexts texts_;
+  RpcStrings texts_;
   std::optional<DbusArguments> read_;
   Bus bus_;
 };

@@ -36,7 +36,7 @@ class RpcFrameReaderTest : public testing::Test {
 
   Result resultOf(std::string_view bytes) { return reader.next(bytes); }
 
-  RpcTexts texts;
+  RpcStrings texts;
   RpcFrameReader reader{texts};
 };
 
@@ -222,7 +222,7 @@ struct Malformed {
 class MalformedFrameTest : public testing::TestWithParam<Malformed> {};
 
 TEST_P(MalformedFrameTest, IsBroken) {
-  RpcTexts texts;
+  RpcStrings texts;
   RpcFrameReader reader(texts);
   // A good frame before it must not make it any better.
   const std::string good = requestWith("91 01");
@@ -272,7 +272,7 @@ struct Refused {
 class RefusedValueTest : public testing::TestWithParam<Refused> {};
 
 TEST_P(RefusedValueTest, IsNotedWithItsPlaceAndTheNextFrameIsRead) {
-  RpcTexts texts;
+  RpcStrings texts;
   RpcFrameReader reader(texts);
   const std::string frames =
       requestWith("93 01") + fromHex(GetParam().argument) + fromHex("03") + requestWith("91 04");

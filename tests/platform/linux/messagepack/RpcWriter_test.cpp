@@ -63,7 +63,7 @@ TEST(RpcWriterTest, WritesWhatTheReaderReads) {
                      {"none", ValueMap{}}};
   std::string out;
   RpcWriter(out).request(1, "m", {Value(map)});
-  RpcTexts texts;
+  RpcStrings texts;
   RpcFrameReader reader(texts);
   std::string_view bytes = out;
   ASSERT_EQ(reader.next(bytes), RpcFrameReader::Result::kFrame);
@@ -85,7 +85,7 @@ TEST(RpcWriterTest, KnowsHowDeepAFrameMayBe) {
   for (const std::size_t depth : {kMostFrameDepth - 2, kMostFrameDepth - 1}) {
     std::string out;
     RpcWriter(out).request(1, "m", {nested(depth)});
-    RpcTexts texts;
+    RpcStrings texts;
     RpcFrameReader reader(texts);
     std::string_view bytes = out;
     EXPECT_EQ(reader.next(bytes) == RpcFrameReader::Result::kFrame, fitsFrameDepth({nested(depth)}));

@@ -80,7 +80,7 @@ class RawClient {
   FileDescriptor socket_;
   bool isConnected_ = false;
   bool hasEnded_ = false;
-  RpcTexts texts_;
+  RpcStrings texts_;
   RpcFrameReader reader_{texts_};
   std::string unread_;
 };

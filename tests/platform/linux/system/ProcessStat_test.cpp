@@ -44,8 +44,8 @@ TEST(ProcessStatTest, IsNoneWithoutANameOrAField) {
 }
 
 TEST(ProcessStatTest, WordsAreWhatIsBetweenWhiteSpace) {
-  EXPECT_THAT(wordsOf("  one\ttwo\n three"), ElementsAre("one", "two", "three"));
-  EXPECT_THAT(wordsOf(" \n"), IsEmpty());
+  EXPECT_THAT(splitWhitespace("  one\ttwo\n three"), ElementsAre("one", "two", "three"));
+  EXPECT_THAT(splitWhitespace(" \n"), IsEmpty());
 }
 
 }  // namespace

@@ -8,7 +8,7 @@
 #include <string_view>
 #include <unistd.h>
 
-#include "platform/linux/files/NamedLines.h"
+#include "platform/linux/files/KeyValueLines.h"
 #include "platform/linux/files/TextFile.h"
 #include "platform/linux/system/ProcessStat.h"
 
@@ -45,7 +45,7 @@ std::optional<ProcessRow> readProcess(const std::string& directory, std::int32_t
   std::string text;
   if (readTextFile(directory + "/stat", text) || !readStat(text, row)) return std::nullopt;
   if (readTextFile(directory + "/status", text)) return std::nullopt;
-  const NamedLines status(text);
+  const KeyValueLines status(text);
   const auto bytesAt = [&](std::string_view name) { return status.number(name).value_or(0) * kKibibyte; };
   row.residentBytes = bytesAt("VmRSS");
   row.privateBytes = bytesAt("RssAnon") + bytesAt("VmSwap");

@@ -176,7 +176,7 @@ class LttngRuntrace::Control {
 
 class LttngRuntrace::Session final : public RuntraceSession {
  public:
-  Session(std::shared_ptr<Control> control, std::shared_ptr<ControlThread::Queue> queue,
+  Session(std::shared_ptr<Control> control, std::shared_ptr<AbandonableThread::Queue> queue,
           const RuntraceConfiguration& configuration)
       : control_(std::move(control)),
         queue_(std::move(queue)),
@@ -213,7 +213,7 @@ class LttngRuntrace::Session final : public RuntraceSession {
   }
 
   const std::shared_ptr<Control> control_;
-  const std::shared_ptr<ControlThread::Queue> queue_;
+  const std::shared_ptr<AbandonableThread::Queue> queue_;
   const std::shared_ptr<Course> course_;
 };
 

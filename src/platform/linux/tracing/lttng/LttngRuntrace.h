@@ -5,7 +5,7 @@
 #include <memory>
 
 #include "platform/linux/tracing/Tracing.h"
-#include "platform/linux/tracing/lttng/ControlThread.h"
+#include "platform/linux/tracing/lttng/AbandonableThread.h"
 
 namespace tonewerk {
 
@@ -34,7 +34,7 @@ class LttngRuntrace final : public Runtrace {
   class Session;
 
   const std::shared_ptr<Control> control_;  // used on the thread, which may outlive this
-  ControlThread thread_;                    // last: it uses the control
+  AbandonableThread thread_;                // last: it uses the control
 };
 
 }  // namespace tonewerk

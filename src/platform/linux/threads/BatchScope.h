@@ -11,25 +11,25 @@ namespace tonewerk {
 // object, such as sending its replies, can be put off to the end of the batch and is then done once.
 //
 // While one exists it is the calling thread's batch. One thread.
-class WorkBatch {
+class BatchScope {
  public:
   // What is put off. Called on the thread that put it off.
-  class Ending {
+  class Deferred {
    public:
-    virtual ~Ending() = default;
+    virtual ~Deferred() = default;
     virtual void endOfBatch() = 0;
   };
 
   // So long does nothing have to wait for others that follow it.
   static constexpr std::size_t kMostPieces = 32;
 
-  WorkBatch();
-  WorkBatch(const WorkBatch&) = delete;
-  WorkBatch& operator=(const WorkBatch&) = delete;
-  ~WorkBatch();
+  BatchScope();
+  BatchScope(const BatchScope&) = delete;
+  BatchScope& operator=(const BatchScope&) = delete;
+  ~BatchScope();
 
   // Puts `ending` off to the end of the calling thread's batch. False when it runs none.
-  static bool putOff(std::shared_ptr<Ending> ending);
+  static bool defer(std::shared_ptr<Deferred> ending);
 
   // A piece of work has run. Ends the batch, and begins the next, after kMostPieces.
   void pieceHasRun();
@@ -37,7 +37,7 @@ class WorkBatch {
  private:
   void end();
 
-  std::vector<std::shared_ptr<Ending>> endings_;
+  std::vector<std::shared_ptr<Deferred>> endings_;
   std::size_t pieces_ = 0;
 };
 

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "platform/linux/threads/WorkBatch.h"
+#include "platform/linux/threads/BatchScope.h"
 
 #include <gmock/gmock.h>
 #include <memory>
@@ -10,17 +10,17 @@ namespace tonewerk {
 namespace {
 
 // Counts how often a batch ended for it.
-class Counter final : public WorkBatch::Ending {
+class Counter final : public BatchScope::Deferred {
  public:
   void endOfBatch() override { ++ends; }
   int ends = 0;
 };
 
-TEST(WorkBatchTest, PutsOffToItsEnd) {
+TEST(BatchScopeTest, PutsOffToItsEnd) {
   const auto counter = std::make_shared<Counter>();
   {
-    WorkBatch batch;
-    EXPECT_TRUE(WorkBatch::putOff(counter));
+    BatchScope batch;
+    EXPECT_TRUE(BatchScope::defer(counter));
     batch.pieceHasRun();
     EXPECT_EQ(counter->ends, 0);
   }
@@ -28,45 +28,45 @@ TEST(WorkBatchTest, PutsOffToItsEnd) {
   EXPECT_EQ(counter.use_count(), 1);
 }
 
-TEST(WorkBatchTest, NothingIsPutOffOutsideOfABatch) {
+TEST(BatchScopeTest, NothingIsPutOffOutsideOfABatch) {
   const auto counter = std::make_shared<Counter>();
-  EXPECT_FALSE(WorkBatch::putOff(counter));
+  EXPECT_FALSE(BatchScope::defer(counter));
   EXPECT_EQ(counter.use_count(), 1);
 }
 
-TEST(WorkBatchTest, EndsAfterSoManyPieces) {
+TEST(BatchScopeTest, EndsAfterSoManyPieces) {
   const auto counter = std::make_shared<Counter>();
-  WorkBatch batch;
-  WorkBatch::putOff(counter);
-  for (std::size_t piece = 1; piece < WorkBatch::kMostPieces; ++piece) batch.pieceHasRun();
+  BatchScope batch;
+  BatchScope::defer(counter);
+  for (std::size_t piece = 1; piece < BatchScope::kMostPieces; ++piece) batch.pieceHasRun();
   EXPECT_EQ(counter->ends, 0);
   batch.pieceHasRun();
   EXPECT_EQ(counter->ends, 1);
 }
 
-TEST(WorkBatchTest, AnEndingMayPutOffAnother) {
-  class Chain final : public WorkBatch::Ending {
+TEST(BatchScopeTest, AnEndingMayPutOffAnother) {
+  class Chain final : public BatchScope::Deferred {
    public:
     explicit Chain(std::shared_ptr<Counter> next) : next_(std::move(next)) {}
-    void endOfBatch() override { WorkBatch::putOff(next_); }
+    void endOfBatch() override { BatchScope::defer(next_); }
 
    private:
     std::shared_ptr<Counter> next_;
   };
   const auto counter = std::make_shared<Counter>();
   {
-    const WorkBatch batch;
-    WorkBatch::putOff(std::make_shared<Chain>(counter));
+    const BatchScope batch;
+    BatchScope::defer(std::make_shared<Chain>(counter));
   }
   EXPECT_EQ(counter->ends, 1);
 }
 
-TEST(WorkBatchTest, AQueuesWorkRunsInBatches) {
+TEST(BatchScopeTest, AQueuesWorkRunsInBatches) {
   const auto counter = std::make_shared<Counter>();
   bool isPutOff = false;
   {
     ThreadQueue queue("test", QueuePriority::kUtility);
-    queue.async([&] { isPutOff = WorkBatch::putOff(counter); });
+    queue.async([&] { isPutOff = BatchScope::defer(counter); });
   }
   EXPECT_TRUE(isPutOff);
   EXPECT_EQ(counter->ends, 1);

@@ -11,10 +11,10 @@
 namespace tonewerk {
 
 // Lines of the form "Name:   value ...", as the kernel's status and meminfo files are.
-class NamedLines {
+class KeyValueLines {
  public:
   // `text` outlives this and what find() gives.
-  explicit NamedLines(std::string_view text) : text_(text) {}
+  explicit KeyValueLines(std::string_view text) : text_(text) {}
 
   // What comes behind the name and white space, up to the line's end; none without such a line: not every
   // kernel has every line. The first of several.

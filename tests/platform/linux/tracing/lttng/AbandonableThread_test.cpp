@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "platform/linux/tracing/lttng/ControlThread.h"
+#include "platform/linux/tracing/lttng/AbandonableThread.h"
 
 #include <atomic>
 #include <future>
@@ -12,27 +12,27 @@ namespace {
 
 using namespace std::chrono_literals;
 
-TEST(ControlThreadTest, RunsPiecesInOrderAndAllOfThemBeforeItEnds) {
+TEST(AbandonableThreadTest, RunsPiecesInOrderAndAllOfThemBeforeItEnds) {
   std::vector<int> ran;
   {
-    const ControlThread thread(1h);
+    const AbandonableThread thread(1h);
     for (int i = 0; i < 100; ++i) thread.queue()->post([&ran, i] { ran.push_back(i); });
   }
   ASSERT_EQ(ran.size(), 100U);
   for (int i = 0; i < 100; ++i) EXPECT_EQ(ran[static_cast<std::size_t>(i)], i);
 }
 
-TEST(ControlThreadTest, PiecesMayPostMore) {
+TEST(AbandonableThreadTest, PiecesMayPostMore) {
   bool ran = false;
   {
-    const ControlThread thread(1h);
+    const AbandonableThread thread(1h);
     thread.queue()->post([&] { thread.queue()->post([&] { ran = true; }); });
   }
   EXPECT_TRUE(ran);
 }
 
-TEST(ControlThreadTest, SaysHowLongItHasBeenBusy) {
-  const ControlThread thread(1h);
+TEST(AbandonableThreadTest, SaysHowLongItHasBeenBusy) {
+  const AbandonableThread thread(1h);
   EXPECT_EQ(thread.queue()->busyFor(), 0ms);
   std::promise<void> begun;
   std::promise<void> goOn;
@@ -47,11 +47,11 @@ TEST(ControlThreadTest, SaysHowLongItHasBeenBusy) {
 }
 
 // What a frozen session daemon does to the daemon's end.
-TEST(ControlThreadTest, LeavesAPieceBehindThatDoesNotReturn) {
+TEST(AbandonableThreadTest, LeavesAPieceBehindThatDoesNotReturn) {
   const auto goOn = std::make_shared<std::promise<void>>();
   const auto ended = std::make_shared<std::promise<void>>();
   {
-    const ControlThread thread(1ms);
+    const AbandonableThread thread(1ms);
     thread.queue()->post([goOn, ended] {
       goOn->get_future().wait();
       ended->set_value();
@@ -61,10 +61,10 @@ TEST(ControlThreadTest, LeavesAPieceBehindThatDoesNotReturn) {
   ended->get_future().wait();
 }
 
-TEST(ControlThreadTest, TakesNoWorkOnceItHasEnded) {
-  std::shared_ptr<ControlThread::Queue> queue;
+TEST(AbandonableThreadTest, TakesNoWorkOnceItHasEnded) {
+  std::shared_ptr<AbandonableThread::Queue> queue;
   {
-    const ControlThread thread(1h);
+    const AbandonableThread thread(1h);
     queue = thread.queue();
   }
   const auto held = std::make_shared<int>(0);

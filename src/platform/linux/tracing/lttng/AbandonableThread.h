@@ -17,7 +17,7 @@ namespace tonewerk {
 //
 // Destroying it runs what is queued, for a while; a piece that does not return by then is left behind with
 // its thread. What pieces use therefore belongs to them, not to whoever destroys this.
-class ControlThread {
+class AbandonableThread {
  public:
   // Where pieces wait; may outlive the thread. Any thread.
   class Queue {
@@ -28,7 +28,7 @@ class ControlThread {
     std::chrono::milliseconds busyFor() const;
 
    private:
-    friend class ControlThread;
+    friend class AbandonableThread;
 
     void run();
     void end();
@@ -43,11 +43,11 @@ class ControlThread {
   };
 
   // `patience`: how long the destructor waits.
-  explicit ControlThread(std::chrono::milliseconds patience);
-  ControlThread(const ControlThread&) = delete;
-  ControlThread& operator=(const ControlThread&) = delete;
+  explicit AbandonableThread(std::chrono::milliseconds patience);
+  AbandonableThread(const AbandonableThread&) = delete;
+  AbandonableThread& operator=(const AbandonableThread&) = delete;
   // Not from a piece.
-  ~ControlThread();
+  ~AbandonableThread();
 
   const std::shared_ptr<Queue>& queue() const { return queue_; }
 

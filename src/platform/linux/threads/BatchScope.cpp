@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "platform/linux/threads/WorkBatch.h"
+#include "platform/linux/threads/BatchScope.h"
 
 #include <cassert>
 #include <utility>
@@ -7,35 +7,35 @@
 namespace tonewerk {
 namespace {
 
-thread_local WorkBatch* currentBatch = nullptr;
+thread_local BatchScope* currentBatch = nullptr;
 
 }  // namespace
 
-WorkBatch::WorkBatch() {
+BatchScope::BatchScope() {
   assert(currentBatch == nullptr);
   currentBatch = this;
 }
 
-WorkBatch::~WorkBatch() {
+BatchScope::~BatchScope() {
   end();
   currentBatch = nullptr;
 }
 
-bool WorkBatch::putOff(std::shared_ptr<Ending> ending) {
+bool BatchScope::defer(std::shared_ptr<Deferred> ending) {
   if (currentBatch == nullptr) return false;
   currentBatch->endings_.push_back(std::move(ending));
   return true;
 }
 
-void WorkBatch::pieceHasRun() {
+void BatchScope::pieceHasRun() {
   if (++pieces_ >= kMostPieces) end();
 }
 
-void WorkBatch::end() {
+void BatchScope::end() {
   pieces_ = 0;
   // By place: an ending may put off another.
   for (std::size_t at = 0; at < endings_.size(); ++at) {
-    const std::shared_ptr<Ending> ending = std::move(endings_[at]);
+    const std::shared_ptr<Deferred> ending = std::move(endings_[at]);
     ending->endOfBatch();
   }
   endings_.clear();

@@ -1,11 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "platform/linux/messagepack/TextCache.h"
+#include "platform/linux/messagepack/StringInterner.h"
 
 #include "platform/linux/files/Utf8.h"
 
 namespace tonewerk {
 
-std::optional<SharedString> TextCache::find(std::string_view text) {
+std::optional<SharedString> StringInterner::find(std::string_view text) {
   if (text.size() > mostBytes_) return isText(text) ? std::optional<SharedString>(text) : std::nullopt;
   std::size_t& guess = slots_[last_].next;
   last_ = guess;

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "platform/linux/tracing/lttng/ControlThread.h"
+#include "platform/linux/tracing/lttng/AbandonableThread.h"
 
 #include <utility>
 
@@ -9,13 +9,13 @@ namespace tonewerk {
 
 using Clock = std::chrono::steady_clock;
 
-ControlThread::ControlThread(std::chrono::milliseconds patience)
+AbandonableThread::AbandonableThread(std::chrono::milliseconds patience)
     : patience_(patience), thread_([queue = queue_] {
         nameThisThread("tonewerk.tracing");
         queue->run();
       }) {}
 
-ControlThread::~ControlThread() {
+AbandonableThread::~AbandonableThread() {
   queue_->end();
   if (queue_->waitForEnd(patience_)) {
     thread_.join();
@@ -24,31 +24,31 @@ ControlThread::~ControlThread() {
   }
 }
 
-void ControlThread::Queue::post(Task work) {
+void AbandonableThread::Queue::post(Task work) {
   const std::lock_guard lock(mutex_);
   if (hasEnded_) return;
   pieces_.push_back(std::move(work));
   changed_.notify_all();
 }
 
-std::chrono::milliseconds ControlThread::Queue::busyFor() const {
+std::chrono::milliseconds AbandonableThread::Queue::busyFor() const {
   const std::lock_guard lock(mutex_);
   if (!busySince_) return std::chrono::milliseconds(0);
   return std::chrono::duration_cast<std::chrono::milliseconds>(Clock::now() - *busySince_);
 }
 
-void ControlThread::Queue::end() {
+void AbandonableThread::Queue::end() {
   const std::lock_guard lock(mutex_);
   isEnding_ = true;
   changed_.notify_all();
 }
 
-bool ControlThread::Queue::waitForEnd(std::chrono::milliseconds patience) {
+bool AbandonableThread::Queue::waitForEnd(std::chrono::milliseconds patience) {
   std::unique_lock lock(mutex_);
   return changed_.wait_for(lock, patience, [this] { return hasEnded_; });
 }
 
-void ControlThread::Queue::run() {
+void AbandonableThread::Queue::run() {
   std::unique_lock lock(mutex_);
   for (;;) {
     changed_.wait(lock, [this] { return isEnding_ || !pieces_.empty(); });

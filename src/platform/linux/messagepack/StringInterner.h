@@ -15,10 +15,10 @@ namespace tonewerk {
 //
 // Each text has one place, by its hash; a newer one takes it over. Memory is so bounded by slots * mostBytes,
 // and a client that sends ever new texts only makes the cache useless. One thread.
-class TextCache {
+class StringInterner {
  public:
   // `slots` a power of two. Texts longer than `mostBytes` are never kept.
-  TextCache(std::size_t slots, std::size_t mostBytes) : slots_(slots), mostBytes_(mostBytes) {}
+  StringInterner(std::size_t slots, std::size_t mostBytes) : slots_(slots), mostBytes_(mostBytes) {}
 
   // The text, shared with its earlier users where possible. None when isText() says that it is none.
   std::optional<SharedString> find(std::string_view text);
