@@ -20,8 +20,8 @@
 #include "platform/Metricon.h"
 #include "platform/SerialQueue.h"
 #include "platform/TracePoints.h"
-#include "service/MessageWatch.h"
-#include "service/MessageWatcher.h"
+#include "service/MessageTap.h"
+#include "service/TapSubscriber.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionMessage.h"
@@ -267,10 +267,10 @@ BENCHMARK(SendToSessions)->ArgName("sessions")->Arg(1)->Arg(1000);
 void NoteForWatchers(benchmark::State& state) {
   Core core;
   const auto session = core.makeSession(77);
-  MessageWatch watch;
-  std::vector<std::shared_ptr<MessageWatcher>> watchers;
+  MessageTap watch;
+  std::vector<std::shared_ptr<TapSubscriber>> watchers;
   for (std::int64_t at = 0; at < state.range(0); ++at) {
-    watchers.push_back(std::make_shared<MessageWatcher>());
+    watchers.push_back(std::make_shared<TapSubscriber>());
     watchers.back()->open({});
     watch.add(watchers.back());
   }

@@ -7,7 +7,7 @@
 
 #include "platform/LogLine.h"
 #include "platform/SerialQueue.h"
-#include "service/MessageWatch.h"
+#include "service/MessageTap.h"
 #include "service/TWReportingServiceDelegateProtocol.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionMessage.h"
@@ -171,7 +171,7 @@ void TWReportingClientServerInstance::sendMessage(ValueMap message, AudioEventCa
                   const auto record =
                       std::make_shared<TWReportingSessionMessage>(std::move(payload), messageCategory, type);
                   sessions[at]->sendMessage(record);
-                  delegate.messageWatch().note(*sessions[at], *record);
+                  delegate.messageTap().note(*sessions[at], *record);
                 }
                 reply(std::nullopt);
               });

@@ -10,7 +10,7 @@
 
 #include "platform/MessagingListener.h"
 #include "platform/TimerService.h"
-#include "service/MessageWatch.h"
+#include "service/MessageTap.h"
 #include "service/TWReportingServiceDelegateProtocol.h"
 
 namespace tonewerk {
@@ -45,7 +45,7 @@ class TWReportingService final : public MessagingListenerDelegate,
   bool isReportingEnabled() const override { return reportingEnabled_; }
   void removeClient(const TWReportingClientServerInstance& client) override;
   void logReportingSessions() override;
-  MessageWatch& messageWatch() override { return messageWatch_; }
+  MessageTap& messageTap() override { return messageTap_; }
   void endProcess() override { endProcess_(); }
 
   // The reaper's tick, twice a second on its thread: takes out the single-message session when it was last
@@ -67,7 +67,7 @@ class TWReportingService final : public MessagingListenerDelegate,
   const std::function<void()> endProcess_;
   std::atomic<bool> reportingEnabled_ = true;
   std::vector<Client> clients_;  // in order of connection; on the work queue
-  MessageWatch messageWatch_;    // likewise
+  MessageTap messageTap_;        // likewise
 
   std::mutex mutex_;  // guards the making of a client and every search for a session
 

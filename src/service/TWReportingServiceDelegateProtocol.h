@@ -9,7 +9,7 @@
 
 namespace tonewerk {
 
-class MessageWatch;
+class MessageTap;
 class TWReportingClientServerInstance;
 class TWReportingSession;
 
@@ -46,7 +46,7 @@ class TWReportingServiceDelegateProtocol {
   virtual void logReportingSessions() = 0;
 
   // Whoever watches the messages that clients send.
-  virtual MessageWatch& messageWatch() = 0;
+  virtual MessageTap& messageTap() = 0;
 
   // Ends the process with the exit status 2 once what the sinks were handed is written; stops no session. Any
   // thread.

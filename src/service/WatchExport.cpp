@@ -8,10 +8,10 @@
 
 #include "platform/LogLine.h"
 #include "platform/SerialQueue.h"
-#include "service/MessageWatch.h"
-#include "service/MessageWatcher.h"
+#include "service/MessageTap.h"
 #include "service/SessionListing.h"
 #include "service/TWReportingServiceDelegateProtocol.h"
+#include "service/TapSubscriber.h"
 #include "session/TWReportingUtility.h"
 #include "values/Value.h"
 
@@ -44,7 +44,7 @@ WatchExport::WatchExport(std::int32_t processIdentifier,
                          std::weak_ptr<TWReportingServiceDelegateProtocol> service)
     : processIdentifier_(processIdentifier),
       service_(std::move(service)),
-      watcher_(std::make_shared<MessageWatcher>()) {}
+      watcher_(std::make_shared<TapSubscriber>()) {}
 
 WatchExport::~WatchExport() = default;
 
@@ -62,7 +62,7 @@ const std::vector<Method>& WatchExport::methods() {
        {ResultType::kAny, "answer"},
        0,
        true},
-      {"watch.nextMessages", {}, {ResultType::kAny, "messages"}, MessageWatcher::kMostAnswerBytes, true},
+      {"watch.nextMessages", {}, {ResultType::kAny, "messages"}, TapSubscriber::kMostAnswerBytes, true},
   };
   return methods;
 }
@@ -87,7 +87,7 @@ void WatchExport::handleRequest(std::size_t method, Arguments arguments, Reply r
                              auto& service, const Reply& answer, InFlightToken&) mutable {
         infoLog(TWReportingServiceDelegateCategory(), "client %i watches messages", client);
         watcher->open(std::move(filter));
-        service.messageWatch().add(watcher);
+        service.messageTap().add(watcher);
         answer(std::nullopt, true);
       });
     }

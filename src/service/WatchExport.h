@@ -10,7 +10,7 @@
 
 namespace tonewerk {
 
-class MessageWatcher;
+class TapSubscriber;
 class TWReportingServiceDelegateProtocol;
 
 // One connection's requests to see what the daemon does now: its sessions, and messages as they arrive.
@@ -30,7 +30,7 @@ class WatchExport final : public RequestHandler {
  private:
   const std::int32_t processIdentifier_;
   const std::weak_ptr<TWReportingServiceDelegateProtocol> service_;
-  const std::shared_ptr<MessageWatcher> watcher_;  // the work queue's
+  const std::shared_ptr<TapSubscriber> watcher_;  // the work queue's
 };
 
 }  // namespace tonewerk

@@ -22,10 +22,10 @@ constexpr int kWrongUsage = 2;
 // How long the daemon has, at the end, to take the last messages.
 constexpr std::chrono::milliseconds kLastWords{3000};
 
-int runBridge(const Diagnostics& diagnostics) {
+int runBridge(const Console& console) {
   const std::unique_ptr<PipeWireLoop> loop = PipeWireLoop::make();
   if (loop == nullptr) {
-    diagnostics.say("cannot make an event loop");
+    console.say("cannot make an event loop");
     return 1;
   }
   const auto quit = [&loop] { loop->quit(); };
@@ -34,18 +34,18 @@ int runBridge(const Diagnostics& diagnostics) {
 
   const SystemClock clock;
   ReporterIdentifiers identifiers(clock, getpid());
-  DaemonLink daemon(*loop, diagnostics);
+  DaemonLink daemon(*loop, console);
   // Users of one daemon publish beside each other.
   const std::string user = std::to_string(getuid());
   DriverStatistics statistics;
-  ChannelPublisher publisher(*loop, clock, diagnostics, "tw-pipewire-" + user + ".json",
+  ChannelPublisher publisher(*loop, clock, console, "tw-pipewire-" + user + ".json",
                              [&] { return statistics.channelsOf("PipeWire<" + user + ">"); });
   PublishingSessionSink sessions(daemon, publisher);
   StreamReports reports(sessions, clock, identifiers, *loop);
   GraphModel model(reports);
   DriverReports drivers(model, statistics, reports, publisher, clock);
   {
-    PipeWireGraph graph(*loop, model, drivers, diagnostics);
+    PipeWireGraph graph(*loop, model, drivers, console);
     const auto onConnected = [&](DaemonLink::Connection connection) {
       publisher.open(std::filesystem::path(daemon.socketPath()).parent_path());
       if (connection == DaemonLink::Connection::kFirst) {
@@ -55,18 +55,18 @@ int runBridge(const Diagnostics& diagnostics) {
       }
     };
     if (!daemon.open(onConnected)) {
-      diagnostics.say("cannot look for the reporting daemon: no memory or no descriptors");
+      console.say("cannot look for the reporting daemon: no memory or no descriptors");
       return 1;
     }
     if (!graph.open()) {
-      diagnostics.say("cannot use PipeWire: its client configuration is missing or broken");
+      console.say("cannot use PipeWire: its client configuration is missing or broken");
       return 1;
     }
     loop->run();
   }
   // Streams that still play are no longer watched: their sessions end here.
   model.clear();
-  if (daemon.isConnected() && !daemon.finish(kLastWords)) diagnostics.say("the daemon took not everything");
+  if (daemon.isConnected() && !daemon.finish(kLastWords)) console.say("the daemon took not everything");
   // Not before: the daemon reads them when a session stops.
   publisher.withdraw();
   return 0;
@@ -94,7 +94,7 @@ int main(int argc, char** argv) {
   }
 
   pw_init(nullptr, nullptr);
-  const int status = tonewerk::runBridge(tonewerk::Diagnostics(verbose));
+  const int status = tonewerk::runBridge(tonewerk::Console(verbose));
   pw_deinit();
   return status;
 }

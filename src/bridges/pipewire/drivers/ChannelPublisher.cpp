@@ -10,10 +10,10 @@
 
 namespace tonewerk {
 
-ChannelPublisher::ChannelPublisher(EventLoop& loop, const Clock& clock, const Diagnostics& diagnostics,
+ChannelPublisher::ChannelPublisher(EventLoop& loop, const Clock& clock, const Console& console,
                                    std::string fileName, Content content)
     : clock_(clock),
-      diagnostics_(diagnostics),
+      console_(console),
       fileName_(std::move(fileName)),
       content_(std::move(content)),
       timer_(loop.makeTimer([this] { publish(); })) {}
@@ -60,7 +60,7 @@ void ChannelPublisher::write() {
     saidFailure_ = false;
     written_ = std::move(text);
   } else if (!std::exchange(saidFailure_, true)) {
-    diagnostics_.say("cannot publish driver channels in " + directory_ + " (" + error.message() + ")");
+    console_.say("cannot publish driver channels in " + directory_ + " (" + error.message() + ")");
   }
 }
 

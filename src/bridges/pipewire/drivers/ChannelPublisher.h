@@ -7,7 +7,7 @@
 #include <optional>
 #include <string>
 
-#include "bridges/pipewire/Diagnostics.h"
+#include "bridges/pipewire/Console.h"
 #include "bridges/pipewire/EventLoop.h"
 #include "platform/Clock.h"
 #include "values/ValueMap.h"
@@ -28,7 +28,7 @@ class ChannelPublisher {
   using Content = std::function<ValueMap()>;
 
   // `content` says what the file is to hold. The others outlive this.
-  ChannelPublisher(EventLoop& loop, const Clock& clock, const Diagnostics& diagnostics, std::string fileName,
+  ChannelPublisher(EventLoop& loop, const Clock& clock, const Console& console, std::string fileName,
                    Content content);
 
   // The daemon is there, and keeps this runtime directory, which may have lost the file: publishes.
@@ -43,7 +43,7 @@ class ChannelPublisher {
   void write();
 
   const Clock& clock_;
-  const Diagnostics& diagnostics_;
+  const Console& console_;
   const std::string fileName_;
   const Content content_;
   std::string directory_;  // empty when not open

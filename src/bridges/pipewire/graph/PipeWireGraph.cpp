@@ -206,7 +206,7 @@ class PipeWireGraph::Connection {
       if (!std::exchange(broken_, true)) graph_.lost();
       return;
     }
-    graph_.diagnostics_.detail(std::string("PipeWire: ") + message);
+    graph_.console_.detail(std::string("PipeWire: ") + message);
   }
 
   void onAppeared(std::uint32_t identifier, std::string_view type, const spa_dict* dictionary) {
@@ -261,10 +261,10 @@ class PipeWireGraph::Connection {
 };
 
 PipeWireGraph::PipeWireGraph(PipeWireLoop& loop, GraphModel& model, ProfileObserver& profiles,
-                             const Diagnostics& diagnostics)
+                             const Console& console)
     : model_(model),
       profiles_(profiles),
-      diagnostics_(diagnostics),
+      console_(console),
       loop_(loop),
       retryTimer_(loop.makeTimer([this] { retryNow(); })) {}
 
@@ -277,7 +277,7 @@ bool PipeWireGraph::open() {
   context_ = pw_context_new(loop_.native(), nullptr, 0);
   if (context_ == nullptr) return false;
   if (!PipeWireProfiler::teach(context_)) {
-    diagnostics_.say("cannot use PipeWire's profiler: no statistics of drivers, no overloads");
+    console_.say("cannot use PipeWire's profiler: no statistics of drivers, no overloads");
   }
   connect();
   return true;
@@ -287,7 +287,7 @@ void PipeWireGraph::connect() {
   connection_ = Connection::make(*this);
   if (connection_ != nullptr) return;
   if (!std::exchange(saidAbsent_, true)) {
-    diagnostics_.say(std::string("no PipeWire (") + std::strerror(errno) + "), trying on");
+    console_.say(std::string("no PipeWire (") + std::strerror(errno) + "), trying on");
   }
   retryTimer_->arm(retryDelay_.next());
 }
@@ -296,13 +296,13 @@ void PipeWireGraph::established() {
   if (std::exchange(established_, true)) return;
   saidAbsent_ = false;
   retryDelay_.reset();
-  diagnostics_.say("connected to PipeWire");
+  console_.say("connected to PipeWire");
 }
 
 // Called from inside the connection, which therefore lives until the timer.
 void PipeWireGraph::lost() {
   established_ = false;
-  diagnostics_.say("lost PipeWire");
+  console_.say("lost PipeWire");
   model_.clear();
   retryTimer_->arm(retryDelay_.next());
 }

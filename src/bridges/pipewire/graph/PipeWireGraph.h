@@ -3,7 +3,7 @@
 
 #include <memory>
 
-#include "bridges/pipewire/Diagnostics.h"
+#include "bridges/pipewire/Console.h"
 #include "bridges/pipewire/RetryDelay.h"
 #include "bridges/pipewire/graph/GraphModel.h"
 #include "bridges/pipewire/graph/PipeWireLoop.h"
@@ -21,8 +21,7 @@ namespace tonewerk {
 class PipeWireGraph {
  public:
   // All outlive this.
-  PipeWireGraph(PipeWireLoop& loop, GraphModel& model, ProfileObserver& profiles,
-                const Diagnostics& diagnostics);
+  PipeWireGraph(PipeWireLoop& loop, GraphModel& model, ProfileObserver& profiles, const Console& console);
   PipeWireGraph(const PipeWireGraph&) = delete;
   PipeWireGraph& operator=(const PipeWireGraph&) = delete;
   ~PipeWireGraph();
@@ -40,7 +39,7 @@ class PipeWireGraph {
 
   GraphModel& model_;
   ProfileObserver& profiles_;
-  const Diagnostics& diagnostics_;
+  const Console& console_;
   PipeWireLoop& loop_;
   pw_context* context_ = nullptr;
   std::unique_ptr<Connection> connection_;

@@ -47,8 +47,8 @@ struct DaemonLink::Asked {
   const char* method;
 };
 
-DaemonLink::DaemonLink(EventLoop& loop, const Diagnostics& diagnostics, std::string socketPath)
-    : diagnostics_(diagnostics), chosenPath_(std::move(socketPath)), inbox_(loop) {}
+DaemonLink::DaemonLink(EventLoop& loop, const Console& console, std::string socketPath)
+    : console_(console), chosenPath_(std::move(socketPath)), inbox_(loop) {}
 
 DaemonLink::~DaemonLink() { twr_client_destroy(client_, 0); }
 
@@ -105,8 +105,8 @@ void DaemonLink::start(std::int64_t reporterID) {
 
 void DaemonLink::message(std::int64_t reporterID, std::uint32_t category, std::uint16_t type,
                          ValueMap message) {
-  if (diagnostics_.isVerbose()) {
-    diagnostics_.detail("session " + std::to_string(reporterID) + ": " + message.text());
+  if (console_.isVerbose()) {
+    console_.detail("session " + std::to_string(reporterID) + ": " + message.text());
   }
   ValuePayload payload;
   payload.set(message);
@@ -167,9 +167,9 @@ void DaemonLink::changed(twr_state state, int error) {
   if (state == TWR_STATE_CONNECTED) return connected();
   if (state != TWR_STATE_WAITING && state != TWR_STATE_ENDED) return;
   if (std::exchange(isConnected_, false)) {
-    diagnostics_.say("lost the reporting daemon (" + textOf(error) + ")");
+    console_.say("lost the reporting daemon (" + textOf(error) + ")");
   } else if (!std::exchange(saidAbsent_, true)) {
-    diagnostics_.say("no reporting daemon (" + textOf(error) + "), trying on");
+    console_.say("no reporting daemon (" + textOf(error) + "), trying on");
   }
 }
 
@@ -177,13 +177,13 @@ void DaemonLink::connected() {
   isConnected_ = true;
   saidAbsent_ = false;
   lastRefusal_.clear();
-  diagnostics_.say("connected to the reporting daemon");
+  console_.say("connected to the reporting daemon");
   onConnected_(std::exchange(wasConnected_, true) ? Connection::kAgain : Connection::kFirst);
 }
 
 void DaemonLink::reportRefusal(const std::string& refusal) {
   if (refusal == lastRefusal_) return;
-  diagnostics_.say(refusal);
+  console_.say(refusal);
   lastRefusal_ = refusal;
 }
 

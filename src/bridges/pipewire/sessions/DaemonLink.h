@@ -7,7 +7,7 @@
 #include <memory>
 #include <string>
 
-#include "bridges/pipewire/Diagnostics.h"
+#include "bridges/pipewire/Console.h"
 #include "bridges/pipewire/LoopInbox.h"
 #include "bridges/pipewire/sessions/SessionSink.h"
 #include "tonewerk/reporting.h"
@@ -30,8 +30,8 @@ class DaemonLink final : public SessionSink {
  public:
   enum class Connection { kFirst, kAgain };
 
-  // `socketPath` empty: where the daemon usually is. `loop` and `diagnostics` outlive this.
-  DaemonLink(EventLoop& loop, const Diagnostics& diagnostics, std::string socketPath = {});
+  // `socketPath` empty: where the daemon usually is. `loop` and `console` outlive this.
+  DaemonLink(EventLoop& loop, const Console& console, std::string socketPath = {});
   DaemonLink(const DaemonLink&) = delete;
   DaemonLink& operator=(const DaemonLink&) = delete;
   ~DaemonLink() override;
@@ -67,7 +67,7 @@ class DaemonLink final : public SessionSink {
   void connected();
   void reportRefusal(const std::string& refusal);
 
-  const Diagnostics& diagnostics_;
+  const Console& console_;
   const std::string chosenPath_;
   std::function<void(Connection connection)> onConnected_;
   bool isConnected_ = false;

@@ -35,11 +35,11 @@ class ChannelPublisherTest : public ::testing::Test {
 
   const TemporaryDirectory directory;
   Said said;
-  Diagnostics diagnostics{false, said.file()};
+  Console console{false, said.file()};
   ManualClock clock;
   ManualEventLoop loop{clock};
   std::int64_t value = 1;
-  ChannelPublisher publisher{loop, clock, diagnostics, kName, [this] { return ValueMap{{"value", value}}; }};
+  ChannelPublisher publisher{loop, clock, console, kName, [this] { return ValueMap{{"value", value}}; }};
 };
 
 TEST_F(ChannelPublisherTest, WritesNothingBeforeItIsOpened) {

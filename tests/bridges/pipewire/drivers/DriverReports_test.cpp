@@ -83,11 +83,11 @@ class DriverReportsTest : public ::testing::Test {
   const TemporaryDirectory directory;
   ManualClock clock;
   ManualEventLoop loop{clock};
-  Diagnostics diagnostics{false};
+  Console console{false};
   MemorySessionSink sink;
   ReporterIdentifiers identifiers{clock, 1};
   DriverStatistics statistics;
-  ChannelPublisher publisher{loop, clock, diagnostics, "graph.json",
+  ChannelPublisher publisher{loop, clock, console, "graph.json",
                              [this] { return statistics.channelsOf("graph"); }};
   StreamReports streams{sink, clock, identifiers, loop};
   GraphModel model{streams};

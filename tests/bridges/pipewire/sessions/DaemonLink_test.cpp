@@ -56,8 +56,8 @@ class DaemonLinkTest : public ::testing::Test {
   ManualClock clock;
   ManualEventLoop loop{clock};
   Said said;
-  Diagnostics diagnostics{false, said.file()};
-  DaemonLink link{loop, diagnostics, path};
+  Console console{false, said.file()};
+  DaemonLink link{loop, console, path};
   std::vector<DaemonLink::Connection> connections;
 };
 

@@ -7,10 +7,10 @@
 namespace tonewerk {
 
 // What the bridge tells the person who runs it: lines on standard error.
-class Diagnostics {
+class Console {
  public:
   // `out` outlives this.
-  explicit Diagnostics(bool verbose, std::FILE* out = stderr) : verbose_(verbose), out_(out) {}
+  explicit Console(bool verbose, std::FILE* out = stderr) : verbose_(verbose), out_(out) {}
 
   // What anybody should know: a peer that came or went, a request that was refused.
   void say(std::string_view line) const;

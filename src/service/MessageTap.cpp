@@ -1,18 +1,18 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "service/MessageWatch.h"
+#include "service/MessageTap.h"
 
 #include <algorithm>
 
-#include "service/MessageWatcher.h"
+#include "service/TapSubscriber.h"
 
 namespace tonewerk {
 
-void MessageWatch::add(const std::shared_ptr<MessageWatcher>& watcher) {
+void MessageTap::add(const std::shared_ptr<TapSubscriber>& watcher) {
   const auto isListed = [&](const auto& listed) { return listed.lock() == watcher; };
   if (std::none_of(watchers_.begin(), watchers_.end(), isListed)) watchers_.push_back(watcher);
 }
 
-void MessageWatch::offer(const TWReportingSession& session, const TWReportingSessionMessage& message) {
+void MessageTap::offer(const TWReportingSession& session, const TWReportingSessionMessage& message) {
   bool oneHasGone = false;
   for (const auto& listed : watchers_) {
     const auto watcher = listed.lock();

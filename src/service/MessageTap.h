@@ -6,16 +6,16 @@
 
 namespace tonewerk {
 
-class MessageWatcher;
+class TapSubscriber;
 class TWReportingSession;
 class TWReportingSessionMessage;
 
 // Who watches the messages that clients send. Those that the daemon derives itself are not shown: they appear
 // where they go, in the reports. On the work queue.
-class MessageWatch {
+class MessageTap {
  public:
   // Held weakly: a watcher goes with its connection. Once is enough.
-  void add(const std::shared_ptr<MessageWatcher>& watcher);
+  void add(const std::shared_ptr<TapSubscriber>& watcher);
 
   // `message` has been received, judged and delivered by `session`.
   void note(const TWReportingSession& session, const TWReportingSessionMessage& message) {
@@ -25,7 +25,7 @@ class MessageWatch {
  private:
   void offer(const TWReportingSession& session, const TWReportingSessionMessage& message);
 
-  std::vector<std::weak_ptr<MessageWatcher>> watchers_;
+  std::vector<std::weak_ptr<TapSubscriber>> watchers_;
 };
 
 }  // namespace tonewerk

@@ -23,7 +23,7 @@ class TWReportingSessionMessage;
 //
 // A client that does not ask in time misses the oldest messages, and is told how many; so it costs no more
 // than the bounds below, and delays nobody. On the work queue.
-class MessageWatcher final : public std::enable_shared_from_this<MessageWatcher> {
+class TapSubscriber final : public std::enable_shared_from_this<TapSubscriber> {
  public:
   // What waits: so many messages, and of so many bytes together.
   static constexpr std::size_t kMostMessages = 4096;

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "service/MessageWatcher.h"
+#include "service/TapSubscriber.h"
 
 #include <utility>
 #include <vector>
@@ -14,7 +14,7 @@
 
 namespace tonewerk {
 
-void MessageWatcher::open(MessageFilter filter) {
+void TapSubscriber::open(MessageFilter filter) {
   isOpen_ = true;
   filter_ = std::move(filter);
   waiting_.clear();
@@ -22,7 +22,7 @@ void MessageWatcher::open(MessageFilter filter) {
   missed_ = 0;
 }
 
-void MessageWatcher::offer(const TWReportingSession& session, const TWReportingSessionMessage& message) {
+void TapSubscriber::offer(const TWReportingSession& session, const TWReportingSessionMessage& message) {
   if (!filter_.wants(session.reporterID(), message.category, message.type)) return;
   SeenMessage seen{session.reporterID(), session.serviceType(), message.category,
                    message.type,         message.isRedundant,   message.message};
@@ -39,7 +39,7 @@ void MessageWatcher::offer(const TWReportingSession& session, const TWReportingS
 }
 
 // The oldest give way: who watches wants to see what happens now.
-void MessageWatcher::keep(SeenMessage message) {
+void TapSubscriber::keep(SeenMessage message) {
   waitingBytes_ += message.bytes();
   waiting_.push_back(std::move(message));
   while (waiting_.size() > kMostMessages || waitingBytes_ > kMostBytes) {
@@ -48,14 +48,14 @@ void MessageWatcher::keep(SeenMessage message) {
   }
 }
 
-MessageWatcher::SeenMessage MessageWatcher::takeOldest() {
+TapSubscriber::SeenMessage TapSubscriber::takeOldest() {
   SeenMessage oldest = std::move(waiting_.front());
   waiting_.pop_front();
   waitingBytes_ -= oldest.bytes();
   return oldest;
 }
 
-void MessageWatcher::next(Reply reply, InFlightToken token) {
+void TapSubscriber::next(Reply reply, InFlightToken token) {
   if (isHeld_) answerHeld();
   if (hasNews()) return reply(std::nullopt, takeAnswer());
   isHeld_ = true;
@@ -63,19 +63,19 @@ void MessageWatcher::next(Reply reply, InFlightToken token) {
   heldToken_ = std::move(token);
 }
 
-void MessageWatcher::answerWithNews() {
+void TapSubscriber::answerWithNews() {
   answerIsQueued_ = false;
   if (hasNews()) answerHeld();  // an earlier answer may have taken them
 }
 
-void MessageWatcher::answerHeld() {
+void TapSubscriber::answerHeld() {
   if (!std::exchange(isHeld_, false)) return;
   heldReply_(std::nullopt, takeAnswer());
   heldReply_ = Reply();
   heldToken_ = InFlightToken();
 }
 
-ValueMap MessageWatcher::takeAnswer() {
+ValueMap TapSubscriber::takeAnswer() {
   std::vector<Value> messages;
   std::size_t bytes = 0;
   while (!waiting_.empty() && bytes + waiting_.front().bytes() <= kMostAnswerBytes) {
@@ -90,7 +90,7 @@ ValueMap MessageWatcher::takeAnswer() {
   return {{kWatchKeyMissed, std::exchange(missed_, 0)}, {kWatchKeyMessages, ValueArray(std::move(messages))}};
 }
 
-ValueMap MessageWatcher::SeenMessage::shown() const {
+ValueMap TapSubscriber::SeenMessage::shown() const {
   return {{kWatchKeyReporterID, reporterID},
           {kWatchKeyServiceType, serviceType},
           {kWatchKeyCategory, category},

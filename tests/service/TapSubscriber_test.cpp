@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "service/MessageWatcher.h"
+#include "service/TapSubscriber.h"
 
 #include <memory>
 #include <string>
@@ -34,9 +34,9 @@ class Gauge final : public InFlightCounter {
   int count = 0;
 };
 
-class MessageWatcherTest : public ReportingTest {
+class TapSubscriberTest : public ReportingTest {
  protected:
-  MessageWatcherTest() {
+  TapSubscriberTest() {
     session->setServiceType(7);
     watcher->open({});
   }
@@ -70,12 +70,12 @@ class MessageWatcherTest : public ReportingTest {
   }
 
   std::shared_ptr<TWReportingSession> session = makeSession(77);
-  std::shared_ptr<MessageWatcher> watcher = std::make_shared<MessageWatcher>();
+  std::shared_ptr<TapSubscriber> watcher = std::make_shared<TapSubscriber>();
   std::shared_ptr<Answers> answers = std::make_shared<Answers>();
   std::shared_ptr<Gauge> gauge = std::make_shared<Gauge>();
 };
 
-TEST_F(MessageWatcherTest, SaysWhatArrivedWhereAndWhen) {
+TEST_F(TapSubscriberTest, SaysWhatArrivedWhereAndWhen) {
   TWReportingSessionMessage record(
       {{"twreporting_timestamp", 1763634000.5}, {"HostApplicationDisplayID", "com.example.player"}}, 4, 1);
   record.isRedundant = true;
@@ -86,7 +86,7 @@ TEST_F(MessageWatcherTest, SaysWhatArrivedWhereAndWhen) {
             R"({"twreporting_timestamp":1763634000.5,"HostApplicationDisplayID":"com.example.player"}}]})");
 }
 
-TEST_F(MessageWatcherTest, GivesEachMessageOnceInOrder) {
+TEST_F(TapSubscriberTest, GivesEachMessageOnceInOrder) {
   offerNumbers(1, 3);
   EXPECT_THAT(numbersIn(next()), ElementsAre(1, 2, 3));
   offerNumbers(4, 4);
@@ -94,7 +94,7 @@ TEST_F(MessageWatcherTest, GivesEachMessageOnceInOrder) {
   EXPECT_EQ(watcher->waitingBytes(), 0U);
 }
 
-TEST_F(MessageWatcherTest, CopiesNoPayload) {
+TEST_F(TapSubscriberTest, CopiesNoPayload) {
   const ValueMap payload{{"number", 1}};
   offer(payload);
   const ValueMap answer = next();
@@ -102,7 +102,7 @@ TEST_F(MessageWatcherTest, CopiesNoPayload) {
   EXPECT_TRUE(message.find("payload")->asMap()->sharesStorageWith(payload));
 }
 
-TEST_F(MessageWatcherTest, HoldsARequestBackUntilThereIsSomething) {
+TEST_F(TapSubscriberTest, HoldsARequestBackUntilThereIsSomething) {
   ask();
   test.queues.runAll();
   EXPECT_THAT(answers->all, IsEmpty());
@@ -117,7 +117,7 @@ TEST_F(MessageWatcherTest, HoldsARequestBackUntilThereIsSomething) {
   EXPECT_THAT(answers->all, SizeIs(1)) << "answered twice";
 }
 
-TEST_F(MessageWatcherTest, AnswersAHeldRequestOnceForAllThatIsQueuedByThen) {
+TEST_F(TapSubscriberTest, AnswersAHeldRequestOnceForAllThatIsQueuedByThen) {
   ask();
   offerNumbers(1, 3);
   EXPECT_THAT(answers->all, IsEmpty());
@@ -126,7 +126,7 @@ TEST_F(MessageWatcherTest, AnswersAHeldRequestOnceForAllThatIsQueuedByThen) {
   EXPECT_THAT(numbersIn(answers->all[0]), ElementsAre(1, 2, 3));
 }
 
-TEST_F(MessageWatcherTest, AnswersTheHeldRequestWithNothingWhenAnotherComes) {
+TEST_F(TapSubscriberTest, AnswersTheHeldRequestWithNothingWhenAnotherComes) {
   ask();
   ask();
   ASSERT_THAT(answers->all, SizeIs(1));
@@ -138,7 +138,7 @@ TEST_F(MessageWatcherTest, AnswersTheHeldRequestWithNothingWhenAnotherComes) {
   EXPECT_THAT(numbersIn(answers->all[1]), ElementsAre(1));
 }
 
-TEST_F(MessageWatcherTest, DoesNotAnswerTheLaterRequestWithNothingWhenTheEarlierTookAll) {
+TEST_F(TapSubscriberTest, DoesNotAnswerTheLaterRequestWithNothingWhenTheEarlierTookAll) {
   ask();
   offerNumbers(1, 1);
   ask();  // the first is answered now, with what has arrived
@@ -151,7 +151,7 @@ TEST_F(MessageWatcherTest, DoesNotAnswerTheLaterRequestWithNothingWhenTheEarlier
   EXPECT_THAT(numbersIn(answers->all[1]), ElementsAre(2));
 }
 
-TEST_F(MessageWatcherTest, ShowsOnlyWhatIsWanted) {
+TEST_F(TapSubscriberTest, ShowsOnlyWhatIsWanted) {
   watcher->open({{77}, {4, 5}, {1}});
   offer({{"number", 1}}, 4, 1);
   offer({{"number", 2}}, 6, 1);
@@ -163,22 +163,22 @@ TEST_F(MessageWatcherTest, ShowsOnlyWhatIsWanted) {
   EXPECT_EQ(next(), ValueMap());
 }
 
-TEST_F(MessageWatcherTest, HoldsSoManyMessagesAndMissesTheOldest) {
-  const int most = static_cast<int>(MessageWatcher::kMostMessages);
+TEST_F(TapSubscriberTest, HoldsSoManyMessagesAndMissesTheOldest) {
+  const int most = static_cast<int>(TapSubscriber::kMostMessages);
   offerNumbers(1, most);
-  EXPECT_EQ(watcher->waitingMessages(), MessageWatcher::kMostMessages);
+  EXPECT_EQ(watcher->waitingMessages(), TapSubscriber::kMostMessages);
   offerNumbers(most + 1, most + 2);
-  EXPECT_EQ(watcher->waitingMessages(), MessageWatcher::kMostMessages);
+  EXPECT_EQ(watcher->waitingMessages(), TapSubscriber::kMostMessages);
   const ValueMap answer = next();
   EXPECT_EQ(answer.integer("missed"), 2);
   EXPECT_EQ(numbersIn(answer).front(), 3);
   EXPECT_EQ(next().integer("missed"), 0) << "told twice";
 }
 
-TEST_F(MessageWatcherTest, HoldsSoManyBytesAndMissesTheOldest) {
+TEST_F(TapSubscriberTest, HoldsSoManyBytesAndMissesTheOldest) {
   const std::string text(100'000, 'x');
   for (int number = 1; number <= 50; ++number) offer({{"number", number}, {"text", text}});
-  EXPECT_LE(watcher->waitingBytes(), MessageWatcher::kMostBytes);
+  EXPECT_LE(watcher->waitingBytes(), TapSubscriber::kMostBytes);
   EXPECT_EQ(watcher->waitingMessages(), 41U);
   std::vector<std::int64_t> numbers;
   std::int64_t missed = 0;
@@ -193,7 +193,7 @@ TEST_F(MessageWatcherTest, HoldsSoManyBytesAndMissesTheOldest) {
   EXPECT_EQ(numbers.back(), 50);
 }
 
-TEST_F(MessageWatcherTest, AnAnswerComesToNoMoreThanItsBound) {
+TEST_F(TapSubscriberTest, AnAnswerComesToNoMoreThanItsBound) {
   const std::string text(200'000, 'x');
   for (int number = 1; number <= 5; ++number) offer({{"number", number}, {"text", text}});
   EXPECT_THAT(numbersIn(next()), ElementsAre(1, 2));
@@ -201,9 +201,9 @@ TEST_F(MessageWatcherTest, AnAnswerComesToNoMoreThanItsBound) {
   EXPECT_THAT(numbersIn(next()), ElementsAre(5));
 }
 
-TEST_F(MessageWatcherTest, MissesAMessageThatNoAnswerHolds) {
+TEST_F(TapSubscriberTest, MissesAMessageThatNoAnswerHolds) {
   ValueMap payload{{"number", 1}, {"text", ""}};
-  const std::size_t room = MessageWatcher::kMostAnswerBytes - MessageWatcher::kRecordBytes - payload.bytes();
+  const std::size_t room = TapSubscriber::kMostAnswerBytes - TapSubscriber::kRecordBytes - payload.bytes();
   payload.set("text", std::string(room, 'x'));
   offer(payload);
   payload.set("text", std::string(room + 1, 'x'));
@@ -213,24 +213,24 @@ TEST_F(MessageWatcherTest, MissesAMessageThatNoAnswerHolds) {
   EXPECT_THAT(numbersIn(answer), ElementsAre(1));
 }
 
-TEST_F(MessageWatcherTest, MissesAPayloadThatIsNestedTooDeepForAnAnswer) {
-  offer(nested(MessageWatcher::kMostPayloadLevels));
-  offer(nested(MessageWatcher::kMostPayloadLevels + 1));
+TEST_F(TapSubscriberTest, MissesAPayloadThatIsNestedTooDeepForAnAnswer) {
+  offer(nested(TapSubscriber::kMostPayloadLevels));
+  offer(nested(TapSubscriber::kMostPayloadLevels + 1));
   const ValueMap answer = next();
   EXPECT_EQ(answer.integer("missed"), 1);
   EXPECT_THAT(*answer.find("messages")->asArray(), SizeIs(1));
 }
 
-TEST_F(MessageWatcherTest, AnswersAHeldRequestAlsoWhenSomethingWasOnlyMissed) {
+TEST_F(TapSubscriberTest, AnswersAHeldRequestAlsoWhenSomethingWasOnlyMissed) {
   ask();
-  offer({{"text", std::string(MessageWatcher::kMostAnswerBytes, 'x')}});
+  offer({{"text", std::string(TapSubscriber::kMostAnswerBytes, 'x')}});
   test.queues.runAll();
   ASSERT_THAT(answers->all, SizeIs(1));
   EXPECT_EQ(answers->all[0].text(), R"({"missed":1,"messages":[]})");
 }
 
-TEST_F(MessageWatcherTest, BeginsAnewWhenItIsOpenedAgain) {
-  offerNumbers(1, static_cast<int>(MessageWatcher::kMostMessages) + 1);
+TEST_F(TapSubscriberTest, BeginsAnewWhenItIsOpenedAgain) {
+  offerNumbers(1, static_cast<int>(TapSubscriber::kMostMessages) + 1);
   watcher->open({});
   EXPECT_EQ(watcher->waitingMessages(), 0U);
   EXPECT_EQ(watcher->waitingBytes(), 0U);
@@ -238,7 +238,7 @@ TEST_F(MessageWatcherTest, BeginsAnewWhenItIsOpenedAgain) {
   EXPECT_EQ(next().integer("missed"), 0);
 }
 
-TEST_F(MessageWatcherTest, GoesWhileAnAnswerIsQueued) {
+TEST_F(TapSubscriberTest, GoesWhileAnAnswerIsQueued) {
   ask();
   offerNumbers(1, 1);
   watcher = nullptr;
@@ -247,7 +247,7 @@ TEST_F(MessageWatcherTest, GoesWhileAnAnswerIsQueued) {
   EXPECT_EQ(gauge->count, 1);
 }
 
-TEST_F(MessageWatcherTest, CutsALongApplicationName) {
+TEST_F(TapSubscriberTest, CutsALongApplicationName) {
   offer({{"HostApplicationDisplayID", std::string(1000, 'x')}});
   const ValueMap answer = next();
   EXPECT_EQ(answer.find("messages")->asArray()->begin()->asMap()->text("application").size(), 256U);
