@@ -35,7 +35,7 @@ constexpr AudioEventCategory kPlayback = 4;
 // Records made at a time, outside of what is measured.
 constexpr std::size_t kBatch = 512;
 // Messages that a session stores beyond what it began with, before another takes its place.
-constexpr std::size_t kMostAdded = 16'384;
+constexpr std::size_t kMaxAdded = 16'384;
 // A client may keep 256 MiB; 100,000 messages of 64 keys are more, and what is not kept is not measured.
 constexpr std::size_t kUnbounded = std::size_t{1} << 40;
 
@@ -212,7 +212,7 @@ void sendMessage(benchmark::State& state, bool isChanging) {
   for (auto _ : state) {
     if (next == records.size()) {
       state.PauseTiming();
-      if (session->messages().size() > stored + kMostAdded) {
+      if (session->messages().size() > stored + kMaxAdded) {
         session.reset();
         session = core.makeSession(77);
         fill(*session, stored, keys);
@@ -238,7 +238,7 @@ BENCHMARK(SendRedundant)->TONEWERK_STORED_AND_KEYS;
 // One message after the other to so many sessions in turn; each stores a few.
 void SendToSessions(benchmark::State& state) {
   constexpr std::size_t kKeys = 8;
-  constexpr std::size_t kMostMessages = 100'000;
+  constexpr std::size_t kMaxMessages = 100'000;
   Core core;
   std::vector<std::shared_ptr<TWReportingSession>> sessions;
   const auto begin = [&] {
@@ -252,7 +252,7 @@ void SendToSessions(benchmark::State& state) {
   for (auto _ : state) {
     if (sent % kBatch == 0) {
       state.PauseTiming();
-      if (sent % kMostMessages < kBatch) begin();
+      if (sent % kMaxMessages < kBatch) begin();
       records = messages.records(kBatch);
       state.ResumeTiming();
     }

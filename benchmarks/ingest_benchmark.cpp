@@ -24,7 +24,7 @@ namespace {
 using Kind = IngestMessages::Kind;
 
 constexpr std::size_t kDefaultRepetitions = 3;
-constexpr std::size_t kMostRepetitions = 100;
+constexpr std::size_t kMaxRepetitions = 100;
 constexpr std::size_t kWindow = 256;
 constexpr std::size_t kMessages = 65'536;
 constexpr std::size_t kFewMessages = 16'384;
@@ -116,7 +116,7 @@ int run(std::size_t repetitions, std::string_view wanted) {
 int main(int argc, char** argv) {
   const std::size_t repetitions =
       argc > 1 ? std::strtoul(argv[1], nullptr, 10) : tonewerk::kDefaultRepetitions;
-  if (argc > 3 || repetitions == 0 || repetitions > tonewerk::kMostRepetitions) {
+  if (argc > 3 || repetitions == 0 || repetitions > tonewerk::kMaxRepetitions) {
     std::fprintf(stderr, "usage: tonewerk_ingest_benchmark [REPETITIONS [SCENARIO]]\n");
     return 2;
   }

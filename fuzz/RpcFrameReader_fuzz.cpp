@@ -56,7 +56,7 @@ void expectSound(const Value& value) {
 void expectRoundTrip(const RpcFrame& frame) {
   std::string written;
   RpcWriter(written).request(frame.identifier, frame.method, frame.arguments);
-  if (written.size() > kMostFrameBytes) return;  // a float of four bytes is written as a double of eight
+  if (written.size() > kMaxFrameBytes) return;  // a float of four bytes is written as a double of eight
   RpcStrings texts;
   RpcFrameReader reader(texts);
   std::string_view bytes = written;
@@ -69,7 +69,7 @@ void expectRoundTrip(const RpcFrame& frame) {
 }
 
 void expectSound(const RpcFrame& frame, std::size_t method) {
-  expect(frame.wireBytes <= kMostFrameBytes);
+  expect(frame.wireBytes <= kMaxFrameBytes);
   expect(isUtf8(frame.method));
   for (const Argument& argument : frame.arguments) {
     if (argument) expectSound(*argument);

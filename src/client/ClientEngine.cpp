@@ -20,7 +20,7 @@ using std::chrono::milliseconds;
 constexpr const char* kThreadName = "tw-reporting";
 constexpr std::size_t kReadBytes = std::size_t{16} * 1024;
 // Reads, and writes, in a row before the other side has its turn.
-constexpr int kMostTransfers = 16;
+constexpr int kMaxTransfers = 16;
 
 std::uint32_t seed() {
   const auto now = static_cast<std::uint64_t>(std::chrono::steady_clock::now().time_since_epoch().count());
@@ -292,7 +292,7 @@ void ClientEngine::waitBeforeNextAttempt(int error) {
 }
 
 void ClientEngine::transmit(Lock& lock) {
-  for (int at = 0; at < kMostTransfers; ++at) {
+  for (int at = 0; at < kMaxTransfers; ++at) {
     const std::string_view bytes = outbox_.unsent();
     if (bytes.empty()) {
       outbox_.sent(0);
@@ -316,7 +316,7 @@ void ClientEngine::transmit(Lock& lock) {
 
 void ClientEngine::receive(Lock& lock) {
   std::array<char, kReadBytes> bytes;
-  for (int at = 0; at < kMostTransfers; ++at) {
+  for (int at = 0; at < kMaxTransfers; ++at) {
     lock.unlock();
     const ClientSocket::Transfer transfer = socket_.receive(bytes.data(), bytes.size());
     lock.lock();

@@ -39,7 +39,7 @@ RingMessage lossOf(const twr_session& session, std::uint64_t lostBefore) {
 bool fitsFrame(const ValueMap& configuration) {
   std::string body;
   appendChange(body, {Kind::kConfiguration, TWR_SERVICE_UNKNOWN, configuration}, 0);
-  return body.size() + kFrameHeadBytes + kReporterIDBytes <= kMostFrameBytes;
+  return body.size() + kFrameHeadBytes + kReporterIDBytes <= kMaxFrameBytes;
 }
 
 // A command of a session marks each of its senders' rings.
@@ -70,7 +70,7 @@ ClientOutbox::ClientOutbox(std::size_t queueBytes, Deliveries& deliveries)
 // ---- callers ----
 
 std::shared_ptr<twr_session> ClientOutbox::addSession(ClientEngine& engine, std::int64_t reporterID) {
-  if (liveSessions_ >= kMostSessions) return nullptr;
+  if (liveSessions_ >= kMaxSessions) return nullptr;
   auto session = std::make_shared<twr_session>(engine, reporterID);
   sessions_.push_back(session);
   ++liveSessions_;
@@ -159,7 +159,7 @@ void ClientOutbox::addBarrier(std::shared_ptr<Waiter> waiter) {
 
 bool ClientOutbox::acceptReply(bool isStart) {
   std::size_t& count = isStart ? startReplyCount_ : replyCount_;
-  if (count >= (isStart ? kMostStartReplies : mostReplies_)) return false;
+  if (count >= (isStart ? kMaxStartReplies : mostReplies_)) return false;
   ++count;
   return true;
 }
@@ -446,7 +446,7 @@ void ClientOutbox::end(twr_status why) {
 
 std::shared_ptr<twr_sender> ClientOutbox::openSender(twr_session& session, const std::atomic<bool>& hasForked,
                                                      std::size_t ringBytes) {
-  if (senders_.size() >= kMostSenders) return nullptr;
+  if (senders_.size() >= kMaxSenders) return nullptr;
   auto sender = std::make_shared<twr_sender>(session.shared_from_this(), hasForked, ringBytes);
   senders_.push_back(sender);
   session.senders.push_back(sender);
@@ -542,7 +542,7 @@ void ClientOutbox::absorbClosedRings() {
     closed.push_back(sender);
     bytes += sender->ring.capacity();
   }
-  if (isConnected_ && bytes <= kMostClosedRingBytes) return;
+  if (isConnected_ && bytes <= kMaxClosedRingBytes) return;
   for (const std::shared_ptr<twr_sender>& sender : closed) absorb(*sender);
 }
 

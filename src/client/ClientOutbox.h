@@ -33,14 +33,14 @@ namespace tonewerk {
 class ClientOutbox {
  public:
   // As many as the daemon takes of one connection.
-  static constexpr std::size_t kMostSessions = 4096;
-  static constexpr std::size_t kMostSenders = 4096;
+  static constexpr std::size_t kMaxSessions = 4096;
+  static constexpr std::size_t kMaxSenders = 4096;
   // Callers that wait for a session's stop, all sessions together.
-  static constexpr std::size_t kMostStartReplies = 2 * kMostSessions;
+  static constexpr std::size_t kMaxStartReplies = 2 * kMaxSessions;
   // Of the queue's bytes, how many make room for one answer to wait for.
   static constexpr std::size_t kBytesPerReply = 64;
   // What closed senders may hold that wait for a daemon that reads nothing; past it they go to the queue.
-  static constexpr std::size_t kMostClosedRingBytes = TWR_MOST_RING_BYTES;
+  static constexpr std::size_t kMaxClosedRingBytes = TWR_MOST_RING_BYTES;
 
   // `deliveries` outlives this.
   ClientOutbox(std::size_t queueBytes, Deliveries& deliveries);

@@ -18,7 +18,7 @@ inline constexpr std::size_t kReporterIDBytes = 9;
 
 // Whether a payload of that size makes a frame that the daemon takes.
 constexpr bool fitsMessageFrame(std::size_t payloadBytes, std::size_t reporterIDs) {
-  constexpr std::size_t kRoom = kMostFrameBytes - kMessageFrameBytes;
+  constexpr std::size_t kRoom = kMaxFrameBytes - kMessageFrameBytes;
   return reporterIDs <= kRoom / kReporterIDBytes && payloadBytes <= kRoom - reporterIDs * kReporterIDBytes;
 }
 

@@ -115,8 +115,8 @@ void init(twr_payload* payload, void* memory, std::size_t size, std::uint32_t fl
   *payload = twr_payload{};
   payload->bytes = static_cast<unsigned char*>(memory);
   payload->flags = flags;
-  constexpr std::size_t kMost = std::numeric_limits<std::uint32_t>::max();
-  if (memory != nullptr) payload->capacity = static_cast<std::uint32_t>(size < kMost ? size : kMost);
+  constexpr std::size_t kMax = std::numeric_limits<std::uint32_t>::max();
+  if (memory != nullptr) payload->capacity = static_cast<std::uint32_t>(size < kMax ? size : kMax);
 }
 
 }  // namespace

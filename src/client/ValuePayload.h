@@ -92,12 +92,12 @@ class ValuePayload {
 
  private:
   static constexpr std::size_t kFirstBytes = 4096;
-  static constexpr std::size_t kMostBytes = std::size_t{2} << 20;  // no frame of the protocol holds as much
+  static constexpr std::size_t kMaxBytes = std::size_t{2} << 20;  // no frame of the protocol holds as much
 
   template <class Fill>
   twr_status fill(Fill once) {
     twr_status status = once();
-    while (status == TWR_TOO_LARGE && memory_.size() < kMostBytes) {
+    while (status == TWR_TOO_LARGE && memory_.size() < kMaxBytes) {
       memory_.resize(memory_.size() * 2);
       status = once();
     }

@@ -233,7 +233,7 @@ twr_status twr_client_request(twr_client* client, const char* method, const twr_
   return guarded([&] {
     std::string body;
     appendRequestBody(body, method, parameters);
-    if (body.size() + kFrameHeadBytes > kMostFrameBytes) return TWR_TOO_LARGE;
+    if (body.size() + kFrameHeadBytes > kMaxFrameBytes) return TWR_TOO_LARGE;
     return client->engine.request([&](ClientOutbox& outbox) {
       PendingReply pending{reply, context};
       pending.mayBeHeld = true;  // who knows what method that is

@@ -20,7 +20,7 @@ struct NotificationHandlers::Registration {
 };
 
 bool NotificationHandlers::isName(std::string_view name) {
-  return !name.empty() && name.size() <= kMostNameBytes && name != "." && name != ".." &&
+  return !name.empty() && name.size() <= kMaxNameBytes && name != "." && name != ".." &&
          name.find('/') == std::string_view::npos && name.find('\0') == std::string_view::npos;
 }
 

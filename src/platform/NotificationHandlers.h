@@ -23,7 +23,7 @@ class NotificationHandlers {
   using Token = NotificationService::Token;
   using Handler = std::function<void(Token)>;
 
-  static constexpr std::size_t kMostNameBytes = 255;
+  static constexpr std::size_t kMaxNameBytes = 255;
   // Whether it can name a notification, which is a file.
   static bool isName(std::string_view name);
 

@@ -11,7 +11,7 @@ namespace {
 
 using enum PreferenceType;
 
-constexpr double kMostInt32 = std::numeric_limits<std::int32_t>::max();
+constexpr double kMaxInt32 = std::numeric_limits<std::int32_t>::max();
 
 constexpr std::string_view kMetricon = "com.orvane.metricon";
 constexpr std::string_view kLinkReport = "com.orvane.linkreport";
@@ -42,8 +42,8 @@ std::vector<Preference> allPreferences() {
        0.0},
       {kTwreporting, "enable_whirlcap", kBoolean, false, "Whether overloads have stall traces made"},
       {kTwreporting, "io_buffer_size", kInteger, 512, "Smallest buffer that counts, in frames; 0 is 512", 0.0,
-       kMostInt32},
-      {kTwreporting, "io_cycle", kInteger, 0, "First cycle whose overload counts", 0.0, kMostInt32},
+       kMaxInt32},
+      {kTwreporting, "io_cycle", kInteger, 0, "First cycle whose overload counts", 0.0, kMaxInt32},
       {kTwreporting, "wait_time", kNumber, 0, "Microseconds from an overload to its trace", 0.0,
        10'000'000.0},
       {.domain = kTwreporting,

@@ -15,7 +15,7 @@ struct MessageFilter {
   using Numbers = std::vector<std::int64_t>;
 
   // Of all its lists together.
-  static constexpr std::size_t kMostEntries = 4096;
+  static constexpr std::size_t kMaxEntries = 4096;
 
   // Ascending.
   Numbers reporterIDs;

@@ -25,7 +25,7 @@ class Portion {
 
   // Whether none of the next `count` is in it; they are then passed.
   bool passes(std::size_t count) {
-    if (passed_ + count > first_ && listed_.size() < kMostListedSessions) return false;
+    if (passed_ + count > first_ && listed_.size() < kMaxListedSessions) return false;
     passed_ += count;
     return true;
   }
@@ -56,7 +56,7 @@ void Portion::add(const TWReportingSession& session, const std::optional<std::st
   if (!session.processIdentifiers().empty()) {
     shown.set(kWatchKeyProcessIdentifier, session.processIdentifiers().front());
   }
-  if (processName) shown.set(kWatchKeyProcessName, shortened(*processName, kMostShownNameBytes));
+  if (processName) shown.set(kWatchKeyProcessName, shortened(*processName, kMaxShownNameBytes));
   if (const auto since = session.startedAt()) {
     shown.set(kWatchKeySeconds, std::chrono::duration<double>(now_ - *since).count());
   }

@@ -55,7 +55,7 @@ void TWReportingClientServerInstance::createReportingSession(ReporterID reporter
     const TracedRequest traced(TWReportingTracePoint::kRequestCreate, reporterID);
     debugLog(category(), "creating session for reporter %lli", reporterID);
     SessionMap& sessions = self.clientReportingSessionMap_;
-    if (sessions.size() >= kMostSessions && !sessions.contains(reporterID)) {
+    if (sessions.size() >= kMaxSessions && !sessions.contains(reporterID)) {
       return reply(messagingError(kOverLimit, "the connection holds " + std::to_string(sessions.size()) +
                                                   " sessions, the most there may be"));
     }
@@ -144,10 +144,10 @@ void TWReportingClientServerInstance::startReportingSessionForID(ReporterID repo
 void TWReportingClientServerInstance::sendMessage(ValueMap message, AudioEventCategory messageCategory,
                                                   AudioEventType type, ReporterIDs reporterIDs,
                                                   ServiceRequest request) {
-  if (reporterIDs && reporterIDs->size() > kMostSessions) {
+  if (reporterIDs && reporterIDs->size() > kMaxSessions) {
     return request.reply(
         messagingError(kOverLimit, "the message names " + std::to_string(reporterIDs->size()) +
-                                       " sessions, the most is " + std::to_string(kMostSessions)));
+                                       " sessions, the most is " + std::to_string(kMaxSessions)));
   }
   if (!reporterIDs || reporterIDs->empty()) {
     const Delegate delegate = delegate_.lock();

@@ -31,7 +31,7 @@ class TWReportingClientServerInstance final
  public:
   // Creating one more is refused, and so is a message that names more: a list of identifiers, however often
   // it names one session, must not turn one frame into a million deliveries.
-  static constexpr std::size_t kMostSessions = 4096;
+  static constexpr std::size_t kMaxSessions = 4096;
 
   using SessionMap = std::map<ReporterID, std::shared_ptr<TWReportingSession>>;
 

@@ -45,7 +45,7 @@ bool changesSomething(std::size_t method) {
 }
 
 // Of a list of reporter identifiers: what some ten clients with all the sessions they may have come to.
-constexpr std::size_t kMostListBytes = std::size_t{512} << 10;
+constexpr std::size_t kMaxListBytes = std::size_t{512} << 10;
 
 ReporterID reporterIDOf(const Argument& argument) { return argument->integer(); }
 AudioServiceType serviceTypeOf(const Argument& argument) {
@@ -79,7 +79,7 @@ std::vector<Method> requestMethods() {
       {"stopReportingSessionForID", {kReporterID}, kSuccess},
       {"destroyReportingSession", {kReporterID}, kSuccess},
       {"reporterIDValid", {kReporterID}, {ResultType::kMap, "validity"}},
-      {"getAllReporters", {}, {ResultType::kInt64List, "reporterIDs"}, kMostListBytes},
+      {"getAllReporters", {}, {ResultType::kInt64List, "reporterIDs"}, kMaxListBytes},
       {"killService", {}, {ResultType::kNever, ""}},
       {"observe", {}, kSuccess},
   };

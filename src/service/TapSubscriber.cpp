@@ -26,7 +26,7 @@ void TapSubscriber::offer(const TWReportingSession& session, const TWReportingSe
   if (!filter_.wants(session.reporterID(), message.category, message.type)) return;
   SeenMessage seen{session.reporterID(), session.serviceType(), message.category,
                    message.type,         message.isRedundant,   message.message};
-  if (seen.bytes() > kMostAnswerBytes) {
+  if (seen.bytes() > kMaxAnswerBytes) {
     ++missed_;
   } else {
     keep(std::move(seen));
@@ -42,7 +42,7 @@ void TapSubscriber::offer(const TWReportingSession& session, const TWReportingSe
 void TapSubscriber::keep(SeenMessage message) {
   waitingBytes_ += message.bytes();
   waiting_.push_back(std::move(message));
-  while (waiting_.size() > kMostMessages || waitingBytes_ > kMostBytes) {
+  while (waiting_.size() > kMaxMessages || waitingBytes_ > kMaxBytes) {
     takeOldest();
     ++missed_;
   }
@@ -78,9 +78,9 @@ void TapSubscriber::answerHeld() {
 ValueMap TapSubscriber::takeAnswer() {
   std::vector<Value> messages;
   std::size_t bytes = 0;
-  while (!waiting_.empty() && bytes + waiting_.front().bytes() <= kMostAnswerBytes) {
+  while (!waiting_.empty() && bytes + waiting_.front().bytes() <= kMaxAnswerBytes) {
     const SeenMessage oldest = takeOldest();
-    if (!nestsWithin(oldest.payload, kMostPayloadLevels)) {
+    if (!nestsWithin(oldest.payload, kMaxPayloadLevels)) {
       ++missed_;
       continue;
     }

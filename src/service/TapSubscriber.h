@@ -26,14 +26,14 @@ class TWReportingSessionMessage;
 class TapSubscriber final : public std::enable_shared_from_this<TapSubscriber> {
  public:
   // What waits: so many messages, and of so many bytes together.
-  static constexpr std::size_t kMostMessages = 4096;
-  static constexpr std::size_t kMostBytes = std::size_t{4} << 20;
+  static constexpr std::size_t kMaxMessages = 4096;
+  static constexpr std::size_t kMaxBytes = std::size_t{4} << 20;
   // What an answer may come to. A message that alone comes to more is missed.
-  static constexpr std::size_t kMostAnswerBytes = std::size_t{512} << 10;
+  static constexpr std::size_t kMaxAnswerBytes = std::size_t{512} << 10;
   // What a message comes to beside its payload, here and in an answer.
   static constexpr std::size_t kRecordBytes = 512;
   // A payload nested deeper is missed: a frame may nest 32 levels, and the answer puts four around it.
-  static constexpr std::size_t kMostPayloadLevels = 28;
+  static constexpr std::size_t kMaxPayloadLevels = 28;
 
   // Begins anew: forgets what waits and what was missed.
   void open(MessageFilter filter);

@@ -35,7 +35,7 @@ std::size_t placeOf(const Argument& number) {
 
 ReplyError tooManyEntries(std::size_t count) {
   return messagingError(kOverLimit, "the filter has " + std::to_string(count) + " entries, the most is " +
-                                        std::to_string(MessageFilter::kMostEntries));
+                                        std::to_string(MessageFilter::kMaxEntries));
 }
 
 }  // namespace
@@ -53,7 +53,7 @@ const std::vector<Method>& WatchExport::methods() {
       {"watch.sessions",
        {{"first", ParameterType::kInt64}},
        {ResultType::kAny, "sessions"},
-       kMostSessionListingBytes,
+       kMaxSessionListingBytes,
        true},
       {"watch.openMessages",
        {{"reporterIDs", ParameterType::kInt64ListOrNone},
@@ -62,7 +62,7 @@ const std::vector<Method>& WatchExport::methods() {
        {ResultType::kAny, "answer"},
        0,
        true},
-      {"watch.nextMessages", {}, {ResultType::kAny, "messages"}, TapSubscriber::kMostAnswerBytes, true},
+      {"watch.nextMessages", {}, {ResultType::kAny, "messages"}, TapSubscriber::kMaxAnswerBytes, true},
   };
   return methods;
 }
@@ -82,7 +82,7 @@ void WatchExport::handleRequest(std::size_t method, Arguments arguments, Reply r
       });
     case kOpenMessages: {
       MessageFilter filter{numbersOf(arguments[0]), numbersOf(arguments[1]), numbersOf(arguments[2])};
-      if (filter.size() > MessageFilter::kMostEntries) return reply(tooManyEntries(filter.size()));
+      if (filter.size() > MessageFilter::kMaxEntries) return reply(tooManyEntries(filter.size()));
       return onWorkQueue([watcher = watcher_, filter = std::move(filter), client = processIdentifier_](
                              auto& service, const Reply& answer, InFlightToken&) mutable {
         infoLog(TWReportingServiceDelegateCategory(), "client %i watches messages", client);

@@ -31,11 +31,11 @@ inline const SharedString kWatchKeyProcessName("processName");
 inline const SharedString kWatchKeySeconds("seconds");
 
 // Names that clients choose are shown this long and no longer.
-inline constexpr std::size_t kMostShownNameBytes = 256;
+inline constexpr std::size_t kMaxShownNameBytes = 256;
 
 // The application that a configuration, or a payload on its way to the workers, names.
 inline Value shownApplication(const ValueMap& map) {
-  return shortened(TWReportingUtilityRetrieveAppName(map), kMostShownNameBytes);
+  return shortened(TWReportingUtilityRetrieveAppName(map), kMaxShownNameBytes);
 }
 
 }  // namespace tonewerk

@@ -9,9 +9,9 @@ namespace tonewerk {
 // work queue.
 class KeptBytesBudget {
  public:
-  static constexpr std::size_t kMostKeptBytes = std::size_t{256} << 20;
+  static constexpr std::size_t kMaxKeptBytes = std::size_t{256} << 20;
 
-  explicit KeptBytesBudget(std::size_t mostBytes = kMostKeptBytes) : most_(mostBytes) {}
+  explicit KeptBytesBudget(std::size_t mostBytes = kMaxKeptBytes) : most_(mostBytes) {}
 
   bool hasRoomFor(std::size_t bytes) const { return bytes <= most_ - used_; }
 

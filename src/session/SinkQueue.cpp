@@ -12,7 +12,7 @@ SinkQueue::~SinkQueue() { queue_.reset(); }
 void SinkQueue::submit(std::size_t bytes, Task work) {
   {
     std::unique_lock lock(mutex_);
-    roomMade_.wait(lock, [&] { return waitingBytes_ == 0 || waitingBytes_ + bytes <= kMostWaitingBytes; });
+    roomMade_.wait(lock, [&] { return waitingBytes_ == 0 || waitingBytes_ + bytes <= kMaxWaitingBytes; });
     waitingBytes_ += bytes;
   }
   queue_->async([this, bytes, work = std::move(work)]() mutable {

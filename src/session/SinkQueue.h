@@ -12,11 +12,11 @@ namespace tonewerk {
 
 // A serial queue for a sink's slow work, bounded by the memory that waits on it.
 //
-// submit() waits while more than kMostWaitingBytes wait: the work queue then waits too, and through the
+// submit() waits while more than kMaxWaitingBytes wait: the work queue then waits too, and through the
 // socket the clients do, so that nothing accepted is dropped. Destroying it runs what is queued.
 class SinkQueue {
  public:
-  static constexpr std::size_t kMostWaitingBytes = std::size_t{64} << 20;
+  static constexpr std::size_t kMaxWaitingBytes = std::size_t{64} << 20;
 
   explicit SinkQueue(std::unique_ptr<SerialQueue> queue);
   ~SinkQueue();

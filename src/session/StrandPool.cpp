@@ -26,7 +26,7 @@ struct StrandPool::Shared {
 
   bool keep(Strand& queue, std::size_t bytes) {
     const std::lock_guard lock(mutex);
-    if (heldBytes + bytes > kMostHeldBytes) {
+    if (heldBytes + bytes > kMaxHeldBytes) {
       ++droppedCount;
       return false;
     }

@@ -25,7 +25,7 @@ class SinkQueue;
 class StrandPool {
  public:
   // What all queues together hold back.
-  static constexpr std::size_t kMostHeldBytes = std::size_t{8} << 20;
+  static constexpr std::size_t kMaxHeldBytes = std::size_t{8} << 20;
 
   explicit StrandPool(std::unique_ptr<SerialQueue> thread);
   StrandPool(const StrandPool&) = delete;

@@ -169,9 +169,9 @@ std::int64_t Value::integer() const {
     case Kind::kInteger:
       return *asInteger();
     case Kind::kUnsigned: {
-      constexpr std::int64_t kMost = std::numeric_limits<std::int64_t>::max();
-      return *asUnsigned() > static_cast<std::uint64_t>(kMost) ? kMost
-                                                               : static_cast<std::int64_t>(*asUnsigned());
+      constexpr std::int64_t kMax = std::numeric_limits<std::int64_t>::max();
+      return *asUnsigned() > static_cast<std::uint64_t>(kMax) ? kMax
+                                                              : static_cast<std::int64_t>(*asUnsigned());
     }
     case Kind::kDouble:
       return saturated(*asDouble());

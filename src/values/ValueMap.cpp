@@ -15,11 +15,11 @@ namespace tonewerk {
 namespace {
 
 // Up to here a walk over the keys is quicker than a probe.
-constexpr std::size_t kMostWithoutIndex = 16;
+constexpr std::size_t kMaxWithoutIndex = 16;
 
 }  // namespace
 
-// The entries in order, and above kMostWithoutIndex a hash table of their places with linear probing.
+// The entries in order, and above kMaxWithoutIndex a hash table of their places with linear probing.
 struct ValueMap::Rep {
   std::vector<Entry> entries;
   std::vector<std::uint32_t>
@@ -74,7 +74,7 @@ struct ValueMap::Rep {
     entries.push_back(std::move(entry));
     if (!slots.empty() && entries.size() * 2 <= slots.size()) {
       index(entries.size() - 1);
-    } else if (entries.size() > kMostWithoutIndex) {
+    } else if (entries.size() > kMaxWithoutIndex) {
       indexAll();
     }
   }
@@ -156,7 +156,7 @@ bool ValueMap::erase(std::string_view key) {
   Entry* entry = rep.find(key);
   rep.bytes -= Rep::bytesOf(*entry);
   rep.entries.erase(rep.entries.begin() + (entry - rep.entries.data()));
-  if (rep.entries.size() > kMostWithoutIndex) {
+  if (rep.entries.size() > kMaxWithoutIndex) {
     rep.indexAll();
   } else {
     rep.slots.clear();  // a table of few slots would fill up unnoticed

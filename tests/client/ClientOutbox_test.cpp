@@ -655,7 +655,7 @@ TEST_F(ClientOutboxTest, BoundsWhatClosedSendersHoldWhileNothingGoesOut) {
 
 TEST_F(ClientOutboxTest, BoundsItsSenders) {
   const auto one = session();
-  for (std::size_t at = 0; at < ClientOutbox::kMostSenders; ++at)
+  for (std::size_t at = 0; at < ClientOutbox::kMaxSenders; ++at)
     ASSERT_NE(outbox->openSender(*one, hasForked, 64), nullptr);
   EXPECT_EQ(outbox->openSender(*one, hasForked, 64), nullptr);
 }

@@ -123,10 +123,10 @@ TEST(MessageFrameTest, PassesAProgramsScribblesOn) {
 }
 
 TEST(MessageFrameTest, FitsAFrameUpToItsLastByte) {
-  const std::size_t most = kMostFrameBytes - kMessageFrameBytes - 2 * kReporterIDBytes;
+  const std::size_t most = kMaxFrameBytes - kMessageFrameBytes - 2 * kReporterIDBytes;
   EXPECT_TRUE(fitsMessageFrame(most, 2));
   EXPECT_FALSE(fitsMessageFrame(most + 1, 2));
-  EXPECT_FALSE(fitsMessageFrame(0, kMostFrameBytes));
+  EXPECT_FALSE(fitsMessageFrame(0, kMaxFrameBytes));
   EXPECT_FALSE(fitsMessageFrame(SIZE_MAX, 1));
 
   // And what fits is one that the daemon reads, with everything in it as long as can be.

@@ -140,8 +140,8 @@ TEST(MessageRingTest, RefusesForEverWhatCanNeverFit) {
 
 TEST(MessageRingTest, RefusesWhatNoFrameCanHold) {
   Ring ring(TWR_MOST_RING_BYTES);
-  EXPECT_EQ(ring.push(1, 0, Text(kMostFrameBytes, 'a')), TWR_TOO_LARGE);
-  EXPECT_EQ(ring.push(1, 0, Text(kMostFrameBytes - 1024, 'a')), TWR_OK);
+  EXPECT_EQ(ring.push(1, 0, Text(kMaxFrameBytes, 'a')), TWR_TOO_LARGE);
+  EXPECT_EQ(ring.push(1, 0, Text(kMaxFrameBytes - 1024, 'a')), TWR_OK);
 }
 
 TEST(MessageRingTest, RefusesAPayloadWithAProblemByThatAndCountsIt) {

@@ -158,11 +158,11 @@ TEST_F(ReportingClientTest, LetsAHandlerDisconnect) {
 }
 
 TEST_F(ReportingClientTest, RefusesWhatNoFrameCarriesAndStaysConnected) {
-  const Value large(ValueMap{{"text", std::string(kMostFrameBytes, 'x')}});
+  const Value large(ValueMap{{"text", std::string(kMaxFrameBytes, 'x')}});
   EXPECT_EQ(client.request("takeMap", {large}, nullptr), std::errc::message_size);
   EXPECT_EQ(client.notify("takeMap", {large}), std::errc::message_size);
   Value deep = 1;
-  for (std::size_t at = 0; at < kMostFrameDepth; ++at) deep = ValueMap{{"deeper", deep}};
+  for (std::size_t at = 0; at < kMaxFrameDepth; ++at) deep = ValueMap{{"deeper", deep}};
   EXPECT_EQ(client.request("takeMap", {deep}, nullptr), std::errc::invalid_argument);
   EXPECT_EQ(client.notify("takeMap", {deep}), std::errc::invalid_argument);
   EXPECT_TRUE(call("takeInt64", {Value(1)}));

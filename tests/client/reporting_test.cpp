@@ -262,8 +262,8 @@ TEST_F(ReportingTest, AllowsNullForEveryObject) {
 
 TEST_F(ReportingTest, RefusesAFrameOverItsLimitAtTheCall) {
   const auto connection = connectWithSession();
-  TestPayload large(kMostFrameBytes + 4096);
-  const std::string text(kMostFrameBytes - 64, 'x');
+  TestPayload large(kMaxFrameBytes + 4096);
+  const std::string text(kMaxFrameBytes - 64, 'x');
   ASSERT_EQ(twr_put_text(large.get(), "text", text.c_str()), TWR_OK);
   EXPECT_EQ(twr_session_send(session, 1, 1, large.get(), nullptr, nullptr), TWR_TOO_LARGE);
   EXPECT_EQ(twr_session_set_configuration(session, large.get(), nullptr, nullptr), TWR_TOO_LARGE);
@@ -272,7 +272,7 @@ TEST_F(ReportingTest, RefusesAFrameOverItsLimitAtTheCall) {
   TestPayload small;
   EXPECT_EQ(twr_client_send(client, 1, 1, small.get(), many.data(), many.size(), nullptr, nullptr),
             TWR_TOO_LARGE);
-  std::vector<unsigned char> memory(kMostFrameBytes + 4096);
+  std::vector<unsigned char> memory(kMaxFrameBytes + 4096);
   twr_payload list;
   twr_payload_init_list(&list, memory.data(), memory.size());
   ASSERT_EQ(twr_put_text(&list, nullptr, text.c_str()), TWR_OK);
@@ -285,29 +285,29 @@ TEST_F(ReportingTest, RefusesAFrameOverItsLimitAtTheCall) {
 
 TEST_F(ReportingTest, RefusesAConfigurationThatHasGrownOverAFrame) {
   const auto connection = connectWithSession();
-  TestPayload half(kMostFrameBytes);
-  const std::string text(kMostFrameBytes / 2 + 1024, 'x');
+  TestPayload half(kMaxFrameBytes);
+  const std::string text(kMaxFrameBytes / 2 + 1024, 'x');
   ASSERT_EQ(twr_put_text(half.get(), "a", text.c_str()), TWR_OK);
   EXPECT_EQ(twr_session_set_configuration(session, half.get(), nullptr, nullptr), TWR_OK);
-  TestPayload other(kMostFrameBytes);
+  TestPayload other(kMaxFrameBytes);
   ASSERT_EQ(twr_put_text(other.get(), "b", text.c_str()), TWR_OK);
   EXPECT_EQ(twr_session_set_configuration(session, other.get(), nullptr, nullptr), TWR_TOO_LARGE);
 }
 
 TEST_F(ReportingTest, CarriesAsLargeAMessageAsAFrameMayBe) {
   ClientSettings large = settings(path);
-  large.queueBytes = 2 * kMostFrameBytes;
+  large.queueBytes = 2 * kMaxFrameBytes;
   makeClientWith(large);
   const auto connection = connectWithSession();
-  TestPayload payload(kMostFrameBytes);
-  const std::string text(kMostFrameBytes - 256, 'x');
+  TestPayload payload(kMaxFrameBytes);
+  const std::string text(kMaxFrameBytes - 256, 'x');
   ASSERT_EQ(twr_put_text(payload.get(), "text", text.c_str()), TWR_OK);
   ASSERT_EQ(twr_session_send(session, 1, 1, payload.get(), nullptr, nullptr), TWR_OK);
   EXPECT_EQ(connection->nextMap().text("text"), text);
 }
 
 TEST_F(ReportingTest, KnowsNoMoreSessionsThanTheDaemon) {
-  for (std::size_t at = 0; at < ClientOutbox::kMostSessions; ++at)
+  for (std::size_t at = 0; at < ClientOutbox::kMaxSessions; ++at)
     ASSERT_NE(session = twr_session_create(client, static_cast<std::int64_t>(at + 10)), nullptr);
   EXPECT_EQ(twr_session_create(client, 9), nullptr);
   EXPECT_EQ(twr_session_destroy(session, nullptr, nullptr), TWR_OK);

@@ -107,12 +107,12 @@ TEST_F(TWReportingDriverUtilityFormatsTest, ASimpleChannelThatWentDownAddsNothin
 }
 
 TEST_F(TWReportingDriverUtilityFormatsTest, ASimpleChannelThatWentUpAddsItsChangeAsAnInteger) {
-  constexpr std::int64_t kMost = std::numeric_limits<std::int64_t>::max();
+  constexpr std::int64_t kMax = std::numeric_limits<std::int64_t>::max();
   EXPECT_EQ(simpleOf(1), (DriverStatsMap{{"Amp_Speaker_Simple_a", std::int64_t{1}}}));
-  const DriverStatsMap most = simpleOf(kMost);
+  const DriverStatsMap most = simpleOf(kMax);
   ASSERT_NE(most.find("Amp_Speaker_Simple_a"), nullptr);
   EXPECT_EQ(most.find("Amp_Speaker_Simple_a")->kind(), Value::Kind::kInteger);
-  EXPECT_EQ(most.integer("Amp_Speaker_Simple_a"), kMost);
+  EXPECT_EQ(most.integer("Amp_Speaker_Simple_a"), kMax);
 }
 
 TEST_F(TWReportingDriverUtilityFormatsTest, AHistogramSaysHowManyBucketsThereAreAndThoseWithHits) {
@@ -152,10 +152,10 @@ TEST_F(TWReportingDriverUtilityFormatsTest, BoundsThatAreAllNegativeStillReportU
 
 TEST_F(TWReportingDriverUtilityFormatsTest, NumbersAreWholeInAllTheirWidth) {
   constexpr std::int64_t kLeast = std::numeric_limits<std::int64_t>::min();
-  constexpr std::int64_t kMost = std::numeric_limits<std::int64_t>::max();
-  ChanmeterRecord record = histogram(speaker("a"), {{kLeast, kMost, kMost}});
+  constexpr std::int64_t kMax = std::numeric_limits<std::int64_t>::max();
+  ChanmeterRecord record = histogram(speaker("a"), {{kLeast, kMax, kMax}});
   record.minimum = kLeast;
-  record.maximum = kMost;
+  record.maximum = kMax;
   EXPECT_EQ(
       histogramOf(record).text("Amp_Speaker_Histogram_a"),
       "count=1,lower=-9223372036854775808,upper=9223372036854775807,min=-9223372036854775808,"
@@ -193,8 +193,8 @@ TEST_F(TWReportingDriverUtilityFormatsTest, AStateChannelWithoutAnyResidencyIsRe
 }
 
 TEST_F(TWReportingDriverUtilityFormatsTest, CountsOfStatesAreUnsigned) {
-  constexpr std::uint64_t kMost = std::numeric_limits<std::uint64_t>::max();
-  EXPECT_EQ(stateOf({{"", kMost, kMost, 1}}).text("Amp_Speaker_State_a"),
+  constexpr std::uint64_t kMax = std::numeric_limits<std::uint64_t>::max();
+  EXPECT_EQ(stateOf({{"", kMax, kMax, 1}}).text("Amp_Speaker_State_a"),
             "name:,transition:18446744073709551615,residency:18446744073709551615,duty_cycle:1.000000;");
 }
 

@@ -7,7 +7,7 @@
 namespace tonewerk {
 namespace {
 
-constexpr std::int64_t kMost = std::numeric_limits<std::int64_t>::max();
+constexpr std::int64_t kMax = std::numeric_limits<std::int64_t>::max();
 constexpr std::int64_t kLeast = std::numeric_limits<std::int64_t>::min();
 
 std::optional<std::string> problemOf(ParameterType type, const Argument& argument) {
@@ -25,10 +25,10 @@ void expectRefused(ParameterType type, const Argument& argument) {
 TEST(RequestSetTest, ASignedIntegerHasAllSixtyFourBits) {
   constexpr ParameterType kType = ParameterType::kInt64;
   for (const Value& value :
-       {Value(kLeast), Value(-1), Value(0), Value(kMost), Value(static_cast<std::uint64_t>(kMost))}) {
+       {Value(kLeast), Value(-1), Value(0), Value(kMax), Value(static_cast<std::uint64_t>(kMax))}) {
     expectSuits(kType, value);
   }
-  expectRefused(kType, Value(static_cast<std::uint64_t>(kMost) + 1));
+  expectRefused(kType, Value(static_cast<std::uint64_t>(kMax) + 1));
 }
 
 TEST(RequestSetTest, AThirtyTwoBitIntegerReachesFromZeroTo4294967295) {
@@ -70,9 +70,9 @@ TEST(RequestSetTest, AListOfIntegersMayBeNilOrEmpty) {
   constexpr ParameterType kType = ParameterType::kInt64ListOrNone;
   expectSuits(kType, std::nullopt);
   expectSuits(kType, Value(ValueArray()));
-  expectSuits(kType, Value(ValueArray{kLeast, 0U, kMost}));
+  expectSuits(kType, Value(ValueArray{kLeast, 0U, kMax}));
   expectRefused(kType, Value(ValueArray{1, 2.0}));
-  expectRefused(kType, Value(ValueArray{static_cast<std::uint64_t>(kMost) + 1}));
+  expectRefused(kType, Value(ValueArray{static_cast<std::uint64_t>(kMax) + 1}));
   expectRefused(kType, Value(ValueArray(std::vector<Value>{Value(ValueArray())})));
   expectRefused(kType, Value(1));
   expectRefused(kType, Value(ValueMap()));

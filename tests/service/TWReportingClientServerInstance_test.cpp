@@ -97,20 +97,20 @@ TEST_F(RequestTest, IdentifierZeroIsStoredAndReachedOnlyByTeardown) {
 }
 
 TEST_F(RequestTest, AConnectionHoldsSoManySessionsAndNotOneMore) {
-  constexpr auto kMost = static_cast<ReporterID>(TWReportingClientServerInstance::kMostSessions);
-  for (ReporterID reporterID = 1; reporterID <= kMost; ++reporterID) {
+  constexpr auto kMax = static_cast<ReporterID>(TWReportingClientServerInstance::kMaxSessions);
+  for (ReporterID reporterID = 1; reporterID <= kMax; ++reporterID) {
     client->notify("createReportingSession", {reporterID});
   }
   run();
-  const auto refused = ask(*client, "createReportingSession", {kMost + 1});
+  const auto refused = ask(*client, "createReportingSession", {kMax + 1});
   ASSERT_THAT(refused, SizeIs(1));
   EXPECT_EQ(refused[0].error->domain, "com.orvane.tonewerk.messaging");
   EXPECT_EQ(refused[0].error->code, 3);
   EXPECT_THAT(refused[0].error->message, HasSubstr("4096"));
-  EXPECT_EQ(sessionOf(0, kMost + 1), nullptr);
-  create(*client, kMost);  // replacing one is not one more
+  EXPECT_EQ(sessionOf(0, kMax + 1), nullptr);
+  create(*client, kMax);  // replacing one is not one more
   askOnce(*client, "destroyReportingSession", {1});
-  create(*client, kMost + 1);
+  create(*client, kMax + 1);
 }
 
 // Service type.

@@ -164,11 +164,11 @@ TEST_F(TapSubscriberTest, ShowsOnlyWhatIsWanted) {
 }
 
 TEST_F(TapSubscriberTest, HoldsSoManyMessagesAndMissesTheOldest) {
-  const int most = static_cast<int>(TapSubscriber::kMostMessages);
+  const int most = static_cast<int>(TapSubscriber::kMaxMessages);
   offerNumbers(1, most);
-  EXPECT_EQ(watcher->waitingMessages(), TapSubscriber::kMostMessages);
+  EXPECT_EQ(watcher->waitingMessages(), TapSubscriber::kMaxMessages);
   offerNumbers(most + 1, most + 2);
-  EXPECT_EQ(watcher->waitingMessages(), TapSubscriber::kMostMessages);
+  EXPECT_EQ(watcher->waitingMessages(), TapSubscriber::kMaxMessages);
   const ValueMap answer = next();
   EXPECT_EQ(answer.integer("missed"), 2);
   EXPECT_EQ(numbersIn(answer).front(), 3);
@@ -178,7 +178,7 @@ TEST_F(TapSubscriberTest, HoldsSoManyMessagesAndMissesTheOldest) {
 TEST_F(TapSubscriberTest, HoldsSoManyBytesAndMissesTheOldest) {
   const std::string text(100'000, 'x');
   for (int number = 1; number <= 50; ++number) offer({{"number", number}, {"text", text}});
-  EXPECT_LE(watcher->waitingBytes(), TapSubscriber::kMostBytes);
+  EXPECT_LE(watcher->waitingBytes(), TapSubscriber::kMaxBytes);
   EXPECT_EQ(watcher->waitingMessages(), 41U);
   std::vector<std::int64_t> numbers;
   std::int64_t missed = 0;
@@ -203,7 +203,7 @@ TEST_F(TapSubscriberTest, AnAnswerComesToNoMoreThanItsBound) {
 
 TEST_F(TapSubscriberTest, MissesAMessageThatNoAnswerHolds) {
   ValueMap payload{{"number", 1}, {"text", ""}};
-  const std::size_t room = TapSubscriber::kMostAnswerBytes - TapSubscriber::kRecordBytes - payload.bytes();
+  const std::size_t room = TapSubscriber::kMaxAnswerBytes - TapSubscriber::kRecordBytes - payload.bytes();
   payload.set("text", std::string(room, 'x'));
   offer(payload);
   payload.set("text", std::string(room + 1, 'x'));
@@ -214,8 +214,8 @@ TEST_F(TapSubscriberTest, MissesAMessageThatNoAnswerHolds) {
 }
 
 TEST_F(TapSubscriberTest, MissesAPayloadThatIsNestedTooDeepForAnAnswer) {
-  offer(nested(TapSubscriber::kMostPayloadLevels));
-  offer(nested(TapSubscriber::kMostPayloadLevels + 1));
+  offer(nested(TapSubscriber::kMaxPayloadLevels));
+  offer(nested(TapSubscriber::kMaxPayloadLevels + 1));
   const ValueMap answer = next();
   EXPECT_EQ(answer.integer("missed"), 1);
   EXPECT_THAT(*answer.find("messages")->asArray(), SizeIs(1));
@@ -223,14 +223,14 @@ TEST_F(TapSubscriberTest, MissesAPayloadThatIsNestedTooDeepForAnAnswer) {
 
 TEST_F(TapSubscriberTest, AnswersAHeldRequestAlsoWhenSomethingWasOnlyMissed) {
   ask();
-  offer({{"text", std::string(TapSubscriber::kMostAnswerBytes, 'x')}});
+  offer({{"text", std::string(TapSubscriber::kMaxAnswerBytes, 'x')}});
   test.queues.runAll();
   ASSERT_THAT(answers->all, SizeIs(1));
   EXPECT_EQ(answers->all[0].text(), R"({"missed":1,"messages":[]})");
 }
 
 TEST_F(TapSubscriberTest, BeginsAnewWhenItIsOpenedAgain) {
-  offerNumbers(1, static_cast<int>(TapSubscriber::kMostMessages) + 1);
+  offerNumbers(1, static_cast<int>(TapSubscriber::kMaxMessages) + 1);
   watcher->open({});
   EXPECT_EQ(watcher->waitingMessages(), 0U);
   EXPECT_EQ(watcher->waitingBytes(), 0U);

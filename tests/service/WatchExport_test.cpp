@@ -143,19 +143,19 @@ TEST_F(WatchExportTest, ListsAllClientsSessionsAndTheSingleMessageSessionLast) {
 TEST_F(WatchExportTest, ListsManySessionsInPortions) {
   const auto first = connect(11);
   const auto second = connect(12);
-  const auto most = static_cast<ReporterID>(kMostListedSessions);
+  const auto most = static_cast<ReporterID>(kMaxListedSessions);
   for (ReporterID reporterID = 1; reporterID <= most; ++reporterID) create(*first, reporterID);
   create(*second, 1001);
   create(*second, 1002);
   const auto portion = listed(*first);
-  EXPECT_THAT(portion, SizeIs(kMostListedSessions));
+  EXPECT_THAT(portion, SizeIs(kMaxListedSessions));
   EXPECT_EQ(total, most + 2);
   EXPECT_THAT(sessionsOf(listed(*first, most - 1)), ElementsAre(most, 1001, 1002));
   EXPECT_THAT(sessionsOf(listed(*first, most)), ElementsAre(1001, 1002));
   EXPECT_THAT(sessionsOf(listed(*first, most + 1)), ElementsAre(1002));
   EXPECT_THAT(listed(*first, most + 2), IsEmpty());
   EXPECT_EQ(total, most + 2);
-  EXPECT_THAT(listed(*first, -1), SizeIs(kMostListedSessions));
+  EXPECT_THAT(listed(*first, -1), SizeIs(kMaxListedSessions));
 }
 
 TEST_F(WatchExportTest, APortionOfTheLongestNamesFitsIntoItsBound) {
@@ -171,7 +171,7 @@ TEST_F(WatchExportTest, APortionOfTheLongestNamesFitsIntoItsBound) {
   ASSERT_THAT(sessions, SizeIs(10));
   EXPECT_EQ(sessions[0].text("application").size(), 256U);
   EXPECT_EQ(sessions[0].text("processName").size(), 256U);
-  EXPECT_LE(sessions[0].bytes() * kMostListedSessions, kMostSessionListingBytes);
+  EXPECT_LE(sessions[0].bytes() * kMaxListedSessions, kMaxSessionListingBytes);
 }
 
 // Messages.
@@ -282,7 +282,7 @@ TEST_F(WatchExportTest, WantsToBeOpenedFirst) {
 
 TEST_F(WatchExportTest, AFilterHasSoManyEntriesAndNoMore) {
   const auto client = connect(11);
-  std::vector<Value> numbers(MessageFilter::kMostEntries - 1, Value(5));
+  std::vector<Value> numbers(MessageFilter::kMaxEntries - 1, Value(5));
   open(*client, {ValueArray(numbers), ValueArray{4}, std::nullopt});
   EXPECT_EQ(refusalOf(*client, "watch.openMessages", {ValueArray(numbers), ValueArray{4}, ValueArray{1}}),
             messagingError(3, "the filter has 4097 entries, the most is 4096"));

@@ -11,7 +11,7 @@
 namespace tonewerk {
 namespace {
 
-constexpr std::size_t kMost = SinkQueue::kMostWaitingBytes;
+constexpr std::size_t kMax = SinkQueue::kMaxWaitingBytes;
 
 class SinkQueueTest : public ::testing::Test {
  protected:
@@ -42,13 +42,13 @@ TEST_F(SinkQueueTest, RunsWorkInOrder) {
 }
 
 TEST_F(SinkQueueTest, TakesWorkUpToItsBoundWithoutWaiting) {
-  sink->submit(kMost - 1, [] {});
+  sink->submit(kMax - 1, [] {});
   sink->submit(1, [] {});
   EXPECT_EQ(queue->pendingCount(), 2U);
 }
 
 TEST_F(SinkQueueTest, MakesTheSubmitterWaitPastItsBound) {
-  sink->submit(kMost, [] {});
+  sink->submit(kMax, [] {});
   std::atomic<bool> taken = false;
   std::thread submitter = submitElsewhere(1, taken);
   EXPECT_EQ(queue->pendingCount(), 1U);
@@ -58,7 +58,7 @@ TEST_F(SinkQueueTest, MakesTheSubmitterWaitPastItsBound) {
 }
 
 TEST_F(SinkQueueTest, TakesAPieceLargerThanItsBoundWhenNothingWaits) {
-  sink->submit(kMost + 1, [] {});
+  sink->submit(kMax + 1, [] {});
   EXPECT_EQ(queue->pendingCount(), 1U);
 }
 

@@ -10,7 +10,7 @@
 namespace tonewerk {
 namespace {
 
-constexpr std::size_t kMost = StrandPool::kMostHeldBytes;
+constexpr std::size_t kMax = StrandPool::kMaxHeldBytes;
 
 class StrandPoolTest : public ::testing::Test {
  protected:
@@ -93,8 +93,8 @@ TEST_F(StrandPoolTest, AnInterruptFromInsideAPieceRunsAtOnce) {
 
 TEST_F(StrandPoolTest, DropsAndCountsWhatFindsNoRoomWhileHeld) {
   submitHolding(*queue);
-  submit(*queue, "a", kMost / 2);
-  submit(*queue, "b", kMost / 2);
+  submit(*queue, "a", kMax / 2);
+  submit(*queue, "b", kMax / 2);
   submit(*queue, "c", 1);
   thread->runAll();
   EXPECT_EQ(queues->droppedCount(), 1U);
@@ -111,7 +111,7 @@ TEST_F(StrandPoolTest, DropsAndCountsWhatFindsNoRoomWhileHeld) {
 TEST_F(StrandPoolTest, TheRoomIsSharedAndComesBackWhenAQueueDies) {
   auto other = queues->makeQueue();
   submitHolding(*other);
-  submit(*other, "x", kMost - 1024);
+  submit(*other, "x", kMax - 1024);
   submitHolding(*queue);
   submit(*queue, "a", 1024);
   thread->runAll();
@@ -127,7 +127,7 @@ TEST_F(StrandPoolTest, TheRoomIsSharedAndComesBackWhenAQueueDies) {
 
 TEST_F(StrandPoolTest, EmptyPiecesTakeRoomToo) {
   submitHolding(*queue);
-  for (std::size_t n = 0; n < kMost / 64; ++n) submit(*queue, "");
+  for (std::size_t n = 0; n < kMax / 64; ++n) submit(*queue, "");
   thread->runAll();
   EXPECT_GT(queues->droppedCount(), 0U);
 }

@@ -22,7 +22,7 @@ namespace {
 
 constexpr std::chrono::seconds kPatience{20};
 constexpr std::size_t kHugeBytes = 100'000'000;
-constexpr std::size_t kMostRequestBytes = std::size_t{20} << 20;
+constexpr std::size_t kMaxRequestBytes = std::size_t{20} << 20;
 
 // A listening socket on a free port of the loopback interface, and the port: 0 when there is none.
 std::pair<int, int> listenOnLoopback() {
@@ -187,7 +187,7 @@ bool OtlpReceiver::readRequest(int connection, Request& request) {
     char piece[65536];
     if (!waitReadable(connection)) return false;
     const ssize_t count = recv(connection, piece, sizeof(piece), 0);
-    if (count <= 0 || bytes.size() > kMostRequestBytes) return false;
+    if (count <= 0 || bytes.size() > kMaxRequestBytes) return false;
     bytes.append(piece, static_cast<std::size_t>(count));
     if (bodyAt != std::string::npos) continue;
     const std::size_t headEnd = bytes.find("\r\n\r\n");

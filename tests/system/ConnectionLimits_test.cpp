@@ -21,7 +21,7 @@ using packed::integer;
 using ::testing::IsEmpty;
 using ::testing::SizeIs;
 
-constexpr auto kMostSessions = static_cast<ReporterID>(TWReportingClientServerInstance::kMostSessions);
+constexpr auto kMaxSessions = static_cast<ReporterID>(TWReportingClientServerInstance::kMaxSessions);
 constexpr ReporterID kFirst = 1000;
 
 // So many that a list of them takes 4.5 KiB; and requests for it whose answers pass every bound many times.
@@ -90,27 +90,27 @@ class UnreadingClient {
 
 TEST_F(ConnectionLimitsTest, AConnectionHoldsSoManySessionsAndNotOneMore) {
   DaemonClient client = connect();
-  createSessions(client, kMostSessions);
-  const Answer refusal = client.call("createReportingSession", {Value(kFirst + kMostSessions)});
+  createSessions(client, kMaxSessions);
+  const Answer refusal = client.call("createReportingSession", {Value(kFirst + kMaxSessions)});
   EXPECT_EQ(errorCodeOf(refusal), 3);
   EXPECT_EQ(refusal.error.value_or(ReplyError()).domain, "com.orvane.tonewerk.messaging");
-  EXPECT_THAT(client.allReporters(), SizeIs(kMostSessions));
+  EXPECT_THAT(client.allReporters(), SizeIs(kMaxSessions));
 
   client.create(kFirst);  // replaces one
   DaemonClient other = connect();
-  other.create(kFirst + kMostSessions);  // the bound is each connection's own
+  other.create(kFirst + kMaxSessions);  // the bound is each connection's own
   client.destroy(kFirst);
-  client.create(kFirst + kMostSessions);
+  client.create(kFirst + kMaxSessions);
   EXPECT_EQ(errorCodeOf(client.call("createReportingSession", {Value(kFirst)})), 3);
 
   client.disconnect();
-  EXPECT_TRUE(waitUntil([&] { return other.allReporters() == std::vector{kFirst + kMostSessions}; }));
+  EXPECT_TRUE(waitUntil([&] { return other.allReporters() == std::vector{kFirst + kMaxSessions}; }));
 }
 
 TEST_F(ConnectionLimitsTest, AMessageNamesSoManySessionsAndNotOneMore) {
   DaemonClient client = connect();
   client.create(kFirst, 7);
-  const std::vector<ReporterID> most(TWReportingClientServerInstance::kMostSessions, kFirst);
+  const std::vector<ReporterID> most(TWReportingClientServerInstance::kMaxSessions, kFirst);
   std::vector<ReporterID> oneMore = most;
   oneMore.push_back(kFirst);
   client.send({{"a", 1}}, 1, 0, most);
@@ -120,7 +120,7 @@ TEST_F(ConnectionLimitsTest, AMessageNamesSoManySessionsAndNotOneMore) {
 }
 
 TEST_F(ConnectionLimitsTest, ManyMoreRequestsThanMayBeUnderWayAreAllAnsweredInOrder) {
-  constexpr std::uint32_t kRequests = 8 * kMostUnfinishedRequests;
+  constexpr std::uint32_t kRequests = 8 * kMaxUnfinishedRequests;
   std::string all;
   for (std::uint32_t at = 0; at < kRequests; ++at) {
     all += packed::request(at, "getServiceNameForReporterID", {integer(5)});

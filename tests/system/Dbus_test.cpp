@@ -208,16 +208,16 @@ TEST_F(DbusTest, WrongCallsAreRefusedAndChangeNothing) {
 }
 
 TEST_F(DbusTest, OneSessionTooManyIsOverTheLimit) {
-  constexpr std::int64_t kMostSessions = 4096;
+  constexpr std::int64_t kMaxSessions = 4096;
   DbusCaller caller = newCaller();
-  for (std::int64_t at = 1; at < kMostSessions; ++at) {
+  for (std::int64_t at = 1; at < kMaxSessions; ++at) {
     caller.sendWithoutAnswer(caller.newCall("CreateReportingSession", "x", at));
     // Not more at once than may be under way.
     if (at % 256 != 0) continue;
     EXPECT_THAT(caller.ask("GetAllReporters").int64List(), SizeIs(static_cast<std::size_t>(at)));
   }
-  EXPECT_TRUE(caller.ask("CreateReportingSession", "x", kMostSessions).boolean());
-  const DbusReceived refused = caller.ask("CreateReportingSession", "x", kMostSessions + 1);
+  EXPECT_TRUE(caller.ask("CreateReportingSession", "x", kMaxSessions).boolean());
+  const DbusReceived refused = caller.ask("CreateReportingSession", "x", kMaxSessions + 1);
   EXPECT_EQ(refused.error, SD_BUS_ERROR_LIMITS_EXCEEDED);
   EXPECT_EQ(refused.text, "the connection holds 4096 sessions, the most there may be");
   EXPECT_THAT(caller.ask("GetAllReporters").int64List(), SizeIs(4096));

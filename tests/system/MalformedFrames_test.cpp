@@ -96,18 +96,18 @@ std::vector<Bytes> malformedFrames() {
 
 // Frames whose headers claim more than ever comes.
 std::vector<Bytes> emptyClaims() {
-  constexpr std::uint32_t kMost = 0xFFFFFFFF;
+  constexpr std::uint32_t kMax = 0xFFFFFFFF;
   const std::string start = arrayHeader(4) + integer(0) + integer(1);
   const std::string inParams = start + text("sendMessage") + arrayHeader(4);
   return {
-      {"4 Gi params", start + text("sendMessage") + arrayHeader(kMost)},
-      {"a list of 4 Gi", inParams + mapHeader(1) + text("a") + arrayHeader(kMost)},
-      {"a map of 4 Gi", inParams + mapHeader(kMost)},
-      {"a text of 4 GiB", inParams + mapHeader(1) + text("a") + textHeader(kMost)},
-      {"a key of 4 GiB", inParams + mapHeader(1) + textHeader(kMost)},
-      {"a method of 4 GiB", start + textHeader(kMost)},
-      {"binary data of 4 GiB", inParams + binaryHeader(kMost)},
-      {"an extension of 4 GiB - 1", inParams + extensionHeader(kMost - 1, 5)},
+      {"4 Gi params", start + text("sendMessage") + arrayHeader(kMax)},
+      {"a list of 4 Gi", inParams + mapHeader(1) + text("a") + arrayHeader(kMax)},
+      {"a map of 4 Gi", inParams + mapHeader(kMax)},
+      {"a text of 4 GiB", inParams + mapHeader(1) + text("a") + textHeader(kMax)},
+      {"a key of 4 GiB", inParams + mapHeader(1) + textHeader(kMax)},
+      {"a method of 4 GiB", start + textHeader(kMax)},
+      {"binary data of 4 GiB", inParams + binaryHeader(kMax)},
+      {"an extension of 4 GiB - 1", inParams + extensionHeader(kMax - 1, 5)},
   };
 }
 
@@ -193,26 +193,26 @@ TEST_F(MalformedFramesTest, WhatCameBeforeABadFrameIsStillCarriedOut) {
 }
 
 TEST_F(MalformedFramesTest, AFrameOfOneMebibyteIsTakenAndALongerOneEndsTheConnection) {
-  for (const std::size_t bytes : {kMostFrameBytes - 1, kMostFrameBytes}) {
+  for (const std::size_t bytes : {kMaxFrameBytes - 1, kMaxFrameBytes}) {
     RawClient client(daemon.socketPath());
     ASSERT_TRUE(client.send(messageOfSize(bytes)));
     const auto answer = client.response();
     ASSERT_TRUE(answer) << bytes;
     EXPECT_FALSE(answer->error) << answer->error->text();
   }
-  expectToEndItsConnection(messageOfSize(kMostFrameBytes + 1));
-  expectToEndItsConnection(messageOfSize(2 * kMostFrameBytes));
+  expectToEndItsConnection(messageOfSize(kMaxFrameBytes + 1));
+  expectToEndItsConnection(messageOfSize(2 * kMaxFrameBytes));
 }
 
 TEST_F(MalformedFramesTest, ThirtyTwoLevelsAreTakenAndThirtyThreeEndTheConnection) {
-  for (const std::size_t depth : {kMostFrameDepth - 1, kMostFrameDepth}) {
+  for (const std::size_t depth : {kMaxFrameDepth - 1, kMaxFrameDepth}) {
     RawClient client(daemon.socketPath());
     ASSERT_TRUE(client.send(messageOfDepth(depth)));
     const auto answer = client.response();
     ASSERT_TRUE(answer) << depth;
     EXPECT_FALSE(answer->error) << answer->error->text();
   }
-  expectToEndItsConnection(messageOfDepth(kMostFrameDepth + 1));
+  expectToEndItsConnection(messageOfDepth(kMaxFrameDepth + 1));
   expectToEndItsConnection(messageOfDepth(100'000));
 }
 
@@ -255,7 +255,7 @@ TEST_F(MalformedFramesTest, AClientKilledInAFrameLeavesItsSessionsToBeStopped) {
     for (;;) pause();
   }
   ASSERT_GT(child, 0);
-  const std::string whole = messageOfSize(kMostFrameBytes);
+  const std::string whole = messageOfSize(kMaxFrameBytes);
   client->send(std::string_view(whole).substr(0, whole.size() / 2));
   client = nullptr;  // now the child alone holds the connection
   EXPECT_THAT(bystander->allReporters(), ::testing::SizeIs(2));

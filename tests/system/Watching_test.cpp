@@ -117,7 +117,7 @@ TEST_F(WatchingTest, AWatcherThatDoesNotAskMissesTheOldestAndHoldsNoMoreThanItsB
     for (const std::int64_t number : numbersIn(answer)) numbers.push_back(number);
   }
   EXPECT_EQ(missed + static_cast<std::int64_t>(numbers.size()), kSent + 1);
-  EXPECT_LE(numbers.size(), TapSubscriber::kMostBytes / text.size() + 1);
+  EXPECT_LE(numbers.size(), TapSubscriber::kMaxBytes / text.size() + 1);
   EXPECT_GT(numbers.size(), 10U);
 }
 
@@ -139,7 +139,7 @@ TEST_F(WatchingTest, TheLargestAndTheDeepestMessageThatAnAnswerHoldsArrive) {
   DaemonClient watcher = connect();
   open(watcher);
   // Leaves room for what the session adds.
-  client.send({{"number", 1}, {"text", std::string(TapSubscriber::kMostAnswerBytes - 2000, 'x')}}, kPlayback,
+  client.send({{"number", 1}, {"text", std::string(TapSubscriber::kMaxAnswerBytes - 2000, 'x')}}, kPlayback,
               kTypeStart, {kSession});
   EXPECT_THAT(numbersIn(nextAnswer(watcher)), ElementsAre(1));
   const auto nested = [](std::size_t levels) {
@@ -147,8 +147,8 @@ TEST_F(WatchingTest, TheLargestAndTheDeepestMessageThatAnAnswerHoldsArrive) {
     for (std::size_t level = 1; level < levels; ++level) map = ValueMap{{"number", 2}, {"inner", map}};
     return map;
   };
-  client.send(nested(TapSubscriber::kMostPayloadLevels + 1), kPlayback, kTypeStart, {kSession});
-  client.send(nested(TapSubscriber::kMostPayloadLevels), kPlayback, kTypeStart, {kSession});
+  client.send(nested(TapSubscriber::kMaxPayloadLevels + 1), kPlayback, kTypeStart, {kSession});
+  client.send(nested(TapSubscriber::kMaxPayloadLevels), kPlayback, kTypeStart, {kSession});
   const ValueMap answer = nextAnswer(watcher);
   EXPECT_EQ(answer.integer("missed"), 1);
   EXPECT_THAT(numbersIn(answer), ElementsAre(2));

@@ -13,7 +13,7 @@ namespace {
 
 constexpr double kInfinity = std::numeric_limits<double>::infinity();
 constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
-constexpr std::int64_t kMost = std::numeric_limits<std::int64_t>::max();
+constexpr std::int64_t kMax = std::numeric_limits<std::int64_t>::max();
 constexpr std::int64_t kLeast = std::numeric_limits<std::int64_t>::min();
 constexpr std::int64_t kTwoTo53 = std::int64_t{1} << 53;
 
@@ -95,7 +95,7 @@ TEST(ValueEqualityTest, NumbersCompareByValueAcrossTheirForms) {
 TEST(ValueEqualityTest, IsExactWhereDoublesAreNot) {
   EXPECT_EQ(Value(kTwoTo53), Value(9007199254740992.0));
   EXPECT_FALSE(Value(kTwoTo53 + 1) == Value(9007199254740992.0));
-  EXPECT_FALSE(Value(kMost) == Value(9223372036854775808.0));
+  EXPECT_FALSE(Value(kMax) == Value(9223372036854775808.0));
   EXPECT_EQ(Value(kLeast), Value(-9223372036854775808.0));
   EXPECT_EQ(Value(std::uint64_t{1} << 63), Value(9223372036854775808.0));
   EXPECT_FALSE(Value(std::numeric_limits<std::uint64_t>::max()) == Value(18446744073709551616.0));
@@ -130,11 +130,11 @@ TEST(ValueConversionTest, BooleanOfATextLooksAtItsBeginning) {
 TEST(ValueConversionTest, IntegerOfADoubleTruncatesAndSaturates) {
   EXPECT_EQ(Value(2.9).integer(), 2);
   EXPECT_EQ(Value(-2.9).integer(), -2);
-  EXPECT_EQ(Value(1e300).integer(), kMost);
+  EXPECT_EQ(Value(1e300).integer(), kMax);
   EXPECT_EQ(Value(-kInfinity).integer(), kLeast);
   EXPECT_EQ(Value(kNaN).integer(), 0);
   EXPECT_EQ(Value(9223372036854774784.0).integer(), 9223372036854774784);
-  EXPECT_EQ(Value(std::numeric_limits<std::uint64_t>::max()).integer(), kMost);
+  EXPECT_EQ(Value(std::numeric_limits<std::uint64_t>::max()).integer(), kMax);
 }
 
 TEST(ValueConversionTest, ATextReadsAsItsLeadingNumber) {
@@ -153,8 +153,8 @@ TEST(ValueConversionTest, ATextReadsAsItsLeadingNumber) {
   EXPECT_EQ(Value("1e999").number(), kInfinity);
   EXPECT_EQ(Value("-1e999").integer(), kLeast);
   EXPECT_EQ(Value("1e-999").number(), 0.0);
-  EXPECT_EQ(Value("9223372036854775807").integer(), kMost);
-  EXPECT_EQ(Value("9223372036854775808").integer(), kMost);
+  EXPECT_EQ(Value("9223372036854775807").integer(), kMax);
+  EXPECT_EQ(Value("9223372036854775808").integer(), kMax);
   EXPECT_EQ(Value("-99999999999999999999").integer(), kLeast);
 }
 

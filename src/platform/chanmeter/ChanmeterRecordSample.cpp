@@ -10,8 +10,8 @@ namespace {
 
 // What lies past the largest index cannot be asked for.
 std::int32_t countOf(std::size_t size) {
-  constexpr auto kMost = std::numeric_limits<std::int32_t>::max();
-  return size > static_cast<std::size_t>(kMost) ? kMost : static_cast<std::int32_t>(size);
+  constexpr auto kMax = std::numeric_limits<std::int32_t>::max();
+  return size > static_cast<std::size_t>(kMax) ? kMax : static_cast<std::int32_t>(size);
 }
 
 template <typename T>

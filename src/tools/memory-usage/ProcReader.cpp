@@ -17,7 +17,7 @@
 namespace tonewerk {
 namespace {
 
-constexpr std::size_t kMostFileBytes = std::size_t{1} << 20;
+constexpr std::size_t kMaxFileBytes = std::size_t{1} << 20;
 
 // The file's text, and errno's value of why there is none. None of these files is empty.
 int readFile(const std::string& path, std::string& text) {
@@ -26,7 +26,7 @@ int readFile(const std::string& path, std::string& text) {
   const std::unique_ptr<std::FILE, int (*)(std::FILE*)> file(std::fopen(path.c_str(), "re"), &std::fclose);
   if (file == nullptr) return errno;
   std::array<char, 4096> buffer;
-  while (text.size() < kMostFileBytes) {
+  while (text.size() < kMaxFileBytes) {
     const std::size_t count = std::fread(buffer.data(), 1, buffer.size(), file.get());
     text.append(buffer.data(), count);
     if (count < buffer.size()) break;

@@ -9,7 +9,7 @@ bool SignpostPairs::add(const SignpostEvent& event) {
   const std::size_t name = indexOf(event.name);
   const Key key{name, event.identifier, event.process, event.thread};
   if (event.isBegin) {
-    if (openCount_ == kMostOpen) return false;
+    if (openCount_ == kMaxOpen) return false;
     open_[key].push_back(event.nanoseconds);
     ++openCount_;
     return true;

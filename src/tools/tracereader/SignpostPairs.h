@@ -25,14 +25,14 @@ struct SignpostEvent {
 // newest begin that is open. What has no partner is left out.
 class SignpostPairs {
  public:
-  static constexpr std::size_t kMostOpen = 1'000'000;
+  static constexpr std::size_t kMaxOpen = 1'000'000;
 
   struct Interval {
     std::size_t name;  // index into names()
     std::uint64_t nanoseconds;
   };
 
-  // In the order of time. False when more than kMostOpen are open: then this is full, and takes no more.
+  // In the order of time. False when more than kMaxOpen are open: then this is full, and takes no more.
   [[nodiscard]] bool add(const SignpostEvent& event);
 
   // All the names seen, in the order of their first sight.

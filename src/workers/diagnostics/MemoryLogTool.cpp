@@ -31,8 +31,8 @@ bool isMemoryLine(std::string_view line) {
 
 // Cuts the next line off, its end included.
 std::string_view takeLine(std::string_view& text) {
-  const std::size_t end = text.substr(0, MemoryLogTool::kMostLineBytes).find('\n');
-  const std::size_t size = end == std::string_view::npos ? MemoryLogTool::kMostLineBytes : end + 1;
+  const std::size_t end = text.substr(0, MemoryLogTool::kMaxLineBytes).find('\n');
+  const std::size_t size = end == std::string_view::npos ? MemoryLogTool::kMaxLineBytes : end + 1;
   const std::string_view line = text.substr(0, size);
   text.remove_prefix(line.size());
   return line;

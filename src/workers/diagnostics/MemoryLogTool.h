@@ -17,7 +17,7 @@ class MemoryLogTool {
   enum class Filter { kMemoryLines, kNone };
 
   // A longer line counts as several.
-  static constexpr std::size_t kMostLineBytes = 2048;
+  static constexpr std::size_t kMaxLineBytes = 2048;
   // What a tool may take; past it, it is ended, and what it said until then is kept.
   static constexpr CommandRunner::Limits kLimits{.bytes = std::size_t{4} << 20,
                                                  .time = std::chrono::seconds(30)};

@@ -19,7 +19,7 @@ namespace {
 
 constexpr std::array<std::string_view, 2> kKeysToCombine{TWReportingMessageKeySpatialAudioAccessoryFeature,
                                                          TWReportingMessageKeySpatializationEnabled};
-constexpr double kMostPauseSeconds = 2.0;  // less than for volume summaries, on purpose
+constexpr double kMaxPauseSeconds = 2.0;  // less than for volume summaries, on purpose
 constexpr IntervalSummaries::Words kWords{"createInputMessages", "input", "runningTime"};
 
 // A sample rate below 1: no vocoder runs.
@@ -146,7 +146,7 @@ TWReportingSessionMessages TWReportingSessionInputMessagesWorker::createInputMes
   const auto owner = session.lock();
   Walk walk(owner == nullptr ? ValueMap() : owner->previousValues(), process, minimumRunningtime);
   for (const auto& message :
-       TWReportingSessionWorkerUtility::combineRapidMessages(messages, kKeysToCombine, kMostPauseSeconds)) {
+       TWReportingSessionWorkerUtility::combineRapidMessages(messages, kKeysToCombine, kMaxPauseSeconds)) {
     walk.step(message->message);
   }
   TWReportingSessionMessages summaries = walk.finish();

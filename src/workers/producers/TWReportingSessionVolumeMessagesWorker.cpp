@@ -17,7 +17,7 @@ namespace {
 
 constexpr std::array<std::string_view, 2> kKeysToCombine{TWReportingMessageKeySpatialAudioAccessoryFeature,
                                                          TWReportingMessageKeySpatializationEnabled};
-constexpr double kMostPauseSeconds = 5.0;
+constexpr double kMaxPauseSeconds = 5.0;
 constexpr IntervalSummaries::Words kWords{"createVolumeMessages", "volume", "playingTime"};
 
 ValueMap defaultState() {
@@ -148,7 +148,7 @@ TWReportingSessionMessages TWReportingSessionVolumeMessagesWorker::createVolumeM
   const auto owner = session.lock();
   Walk walk(owner == nullptr ? ValueMap() : owner->previousValues(), process, minimumPlaytime);
   for (const auto& message :
-       TWReportingSessionWorkerUtility::combineRapidMessages(messages, kKeysToCombine, kMostPauseSeconds)) {
+       TWReportingSessionWorkerUtility::combineRapidMessages(messages, kKeysToCombine, kMaxPauseSeconds)) {
     walk.step(message->message);
   }
   return walk.finish();

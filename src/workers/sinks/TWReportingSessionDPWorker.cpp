@@ -43,9 +43,9 @@ std::int32_t bufferSizeOf(const TWReportingSessionMessage& message) {
 
 // Whole microseconds; none for what is no time.
 std::chrono::microseconds waitTimeOf(double microseconds) {
-  constexpr std::chrono::microseconds kMost = TWReportingSessionDPWorker::kMostWaitTime;
+  constexpr std::chrono::microseconds kMax = TWReportingSessionDPWorker::kMaxWaitTime;
   if (!(microseconds > 0.0)) return std::chrono::microseconds(0);
-  if (microseconds >= static_cast<double>(kMost.count())) return kMost;
+  if (microseconds >= static_cast<double>(kMax.count())) return kMax;
   return std::chrono::microseconds(static_cast<std::int64_t>(microseconds));
 }
 

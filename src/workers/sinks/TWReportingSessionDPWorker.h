@@ -21,7 +21,7 @@ class TWReportingSessionDPWorker final : public TWReportingSessionWorkerConsumer
   const TWReportingSessionWorkerClass& workerClass() const override { return kWorkerClass; }
 
   // No pause before a request is longer, whatever "wait_time" says: nothing else happens meanwhile.
-  static constexpr std::chrono::seconds kMostWaitTime{10};
+  static constexpr std::chrono::seconds kMaxWaitTime{10};
 
   // Reads the settings of all workers anew. None unless it is switched on.
   static std::shared_ptr<TWReportingSessionDPWorker> initWithSession(

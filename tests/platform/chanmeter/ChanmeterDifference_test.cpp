@@ -15,7 +15,7 @@ using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
 constexpr std::int64_t kLeast = std::numeric_limits<std::int64_t>::min();
-constexpr std::int64_t kMost = std::numeric_limits<std::int64_t>::max();
+constexpr std::int64_t kMax = std::numeric_limits<std::int64_t>::max();
 
 std::vector<ChanmeterRecord> difference(std::vector<ChanmeterRecord> earlier,
                                         std::vector<ChanmeterRecord> later) {
@@ -49,13 +49,13 @@ TEST(ChanmeterDifferenceTest, SimpleValuesSubtract) {
 }
 
 TEST(ChanmeterDifferenceTest, AChangeThatDoesNotFitIsTheNearestThatDoes) {
-  EXPECT_EQ(simpleDifference(kLeast, kMost), kMost);
-  EXPECT_EQ(simpleDifference(-1, kMost), kMost);
-  EXPECT_EQ(simpleDifference(0, kMost), kMost);
-  EXPECT_EQ(simpleDifference(kMost, kLeast), kLeast);
+  EXPECT_EQ(simpleDifference(kLeast, kMax), kMax);
+  EXPECT_EQ(simpleDifference(-1, kMax), kMax);
+  EXPECT_EQ(simpleDifference(0, kMax), kMax);
+  EXPECT_EQ(simpleDifference(kMax, kLeast), kLeast);
   EXPECT_EQ(simpleDifference(1, kLeast), kLeast);
   EXPECT_EQ(simpleDifference(0, kLeast), kLeast);
-  EXPECT_EQ(simpleDifference(kLeast, 0), kMost);
+  EXPECT_EQ(simpleDifference(kLeast, 0), kMax);
   EXPECT_EQ(simpleDifference(kLeast, kLeast), 0);
 }
 
@@ -77,10 +77,10 @@ TEST(ChanmeterDifferenceTest, DutyCyclesOfStatesWithoutResidencyAreZero) {
 }
 
 TEST(ChanmeterDifferenceTest, ResidenciesWhoseSumDoesNotFitStillGiveDutyCycles) {
-  constexpr std::uint64_t kMostTime = std::numeric_limits<std::uint64_t>::max();
-  EXPECT_THAT(stateDifference({{"on", 0, 0, 0}, {"off", 0, 0, 0}},
-                              {{"on", 0, kMostTime, 0}, {"off", 0, kMostTime, 0}}),
-              ElementsAre(ChanmeterState{"on", 0, kMostTime, 0.5}, ChanmeterState{"off", 0, kMostTime, 0.5}));
+  constexpr std::uint64_t kMaxTime = std::numeric_limits<std::uint64_t>::max();
+  EXPECT_THAT(
+      stateDifference({{"on", 0, 0, 0}, {"off", 0, 0, 0}}, {{"on", 0, kMaxTime, 0}, {"off", 0, kMaxTime, 0}}),
+      ElementsAre(ChanmeterState{"on", 0, kMaxTime, 0.5}, ChanmeterState{"off", 0, kMaxTime, 0.5}));
 }
 
 TEST(ChanmeterDifferenceTest, StatesMatchByNameWhateverTheirPlace) {

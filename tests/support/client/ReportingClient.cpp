@@ -37,7 +37,7 @@ Answer answerOf(RpcFrame& frame) {
 }
 
 std::error_code problemWithFrame(const std::string& frame, const Arguments& arguments) {
-  if (frame.size() > kMostFrameBytes) return std::make_error_code(std::errc::message_size);
+  if (frame.size() > kMaxFrameBytes) return std::make_error_code(std::errc::message_size);
   if (!fitsFrameDepth(arguments)) return std::make_error_code(std::errc::invalid_argument);
   return {};
 }

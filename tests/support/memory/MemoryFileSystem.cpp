@@ -7,7 +7,7 @@
 namespace tonewerk {
 namespace {
 
-constexpr std::size_t kMostNameBytes = 255;
+constexpr std::size_t kMaxNameBytes = 255;
 
 bool isPlainName(std::string_view name) {
   return !name.empty() && name != "." && name != ".." && name.find('/') == std::string_view::npos &&
@@ -85,7 +85,7 @@ std::unique_ptr<NewFile> MemoryFileSystem::createFile(const std::string& directo
     error = std::make_error_code(std::errc::invalid_argument);
   } else if (!state_->directories.contains(directory)) {
     error = std::make_error_code(std::errc::no_such_file_or_directory);
-  } else if (name.size() > kMostNameBytes) {
+  } else if (name.size() > kMaxNameBytes) {
     error = std::make_error_code(std::errc::filename_too_long);
   } else if (state_->holds(directory + "/" + name)) {
     error = std::make_error_code(std::errc::file_exists);

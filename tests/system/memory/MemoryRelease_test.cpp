@@ -113,7 +113,7 @@ TEST_F(MemoryReleaseTest, OfAStormOfFramesThatNeverEndIsTheSystemsAgain) {
   constexpr std::size_t kBytes = std::size_t{400} << 10;
   std::string frame = packed::arrayHeader(4) + packed::integer(0) + packed::integer(1) +
                       packed::text("sendMessage") + packed::arrayHeader(4) +
-                      packed::arrayHeader(kMostFrameBytes);
+                      packed::arrayHeader(kMaxFrameBytes);
   while (frame.size() < kBytes) frame += std::string("\x91\x00", 2);
   std::list<RawClient> storm;
   for (int count = 0; count < 50; ++count) {

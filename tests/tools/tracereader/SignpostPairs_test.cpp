@@ -95,7 +95,7 @@ TEST_F(SignpostPairsTest, AClockThatWentBackGivesAnIntervalOfNoLength) {
 }
 
 TEST_F(SignpostPairsTest, HoldsABoundedNumberOfOpenIntervals) {
-  for (std::size_t i = 0; i < SignpostPairs::kMostOpen; ++i) begin("a", 0);
+  for (std::size_t i = 0; i < SignpostPairs::kMaxOpen; ++i) begin("a", 0);
   EXPECT_FALSE(pairs_.add({true, "a", 0, 1, 1, 0}));
   end("a", 1);
   begin("a", 2);

@@ -12,8 +12,8 @@ namespace {
 using std::chrono::nanoseconds;
 
 // Far above what any graph uses. The memory that these numbers come from is shared with clients.
-constexpr std::int64_t kMostFrames = 1 << 20;
-constexpr std::uint32_t kMostHertz = 1 << 24;
+constexpr std::int64_t kMaxFrames = 1 << 20;
+constexpr std::uint32_t kMaxHertz = 1 << 24;
 constexpr nanoseconds kLongest = std::chrono::seconds(60);
 
 // The activation's state of a node that is done with its cycle.
@@ -64,8 +64,8 @@ bool readClock(const spa_pod& pod, ProfiledCycle& cycle) {
   const int result = spa_pod_parse_struct(&pod, SPA_POD_Int(&flags), SPA_POD_Int(&identifier),
                                           SPA_POD_String(&name), SPA_POD_Long(&time), SPA_POD_Fraction(&rate),
                                           SPA_POD_Long(&position), SPA_POD_Long(&frames));
-  if (result < 0 || frames <= 0 || frames > kMostFrames) return false;
-  if (rate.num == 0 || rate.denom == 0 || rate.num > kMostHertz || rate.denom > kMostHertz) return false;
+  if (result < 0 || frames <= 0 || frames > kMaxFrames) return false;
+  if (rate.num == 0 || rate.denom == 0 || rate.num > kMaxHertz || rate.denom > kMaxHertz) return false;
   const double seconds = static_cast<double>(frames) * rate.num / rate.denom;
   if (seconds > std::chrono::duration<double>(kLongest).count()) return false;
   cycle.frames = static_cast<std::uint32_t>(frames);

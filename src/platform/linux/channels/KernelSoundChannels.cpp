@@ -146,7 +146,7 @@ void KernelSoundChannels::readSubstreams(Reading& reading, const std::string& dr
       const std::string sub = numbered("sub", substream);
       ChanmeterKey key{.driver = driver, .group = group, .subGroup = pcm};
       key.subGroup->append(" ").append(sub);
-      if (++reading.substreams > kMostSubstreams) {
+      if (++reading.substreams > kMaxSubstreams) {
         return complain(reading, kChannelsTooMany, directory, "has one substream too many");
       }
       readSubstream(reading, std::move(key), pathIn(directory, sub));
@@ -173,7 +173,7 @@ void KernelSoundChannels::addIfChosen(Reading& reading, ChanmeterRecord record) 
 
 std::shared_ptr<const ChanmeterRecord> KernelSoundChannels::shared(ChanmeterRecord record) {
   const std::lock_guard lock(mutex_);
-  if (latest_.size() >= kMostKept) latest_.clear();  // cards came and went
+  if (latest_.size() >= kMaxKept) latest_.clear();  // cards came and went
   auto& latest = latest_[record.key];
   if (latest == nullptr || *latest != record) {
     latest = std::make_shared<const ChanmeterRecord>(std::move(record));
@@ -185,7 +185,7 @@ void KernelSoundChannels::complain(Reading& reading, std::int64_t code, const st
                                    std::string_view what) {
   if (!reading.error) reading.error = ChanmeterError{code};
   const std::lock_guard lock(mutex_);
-  if (complaints_.size() >= kMostSubstreams || !complaints_.insert(path).second) return;
+  if (complaints_.size() >= kMaxSubstreams || !complaints_.insert(path).second) return;
   errorLog(log_, "%s: %s (failure %lli; the channels concerned are left out)", path, what, code);
 }
 

@@ -32,8 +32,8 @@ namespace tonewerk {
 // Any thread.
 class KernelSoundChannels {
  public:
-  static constexpr std::size_t kMostSubstreams = 256;  // of all cards together; the others are left out
-  static constexpr std::size_t kMostKept = 4 * kMostSubstreams;  // records; past them all are forgotten
+  static constexpr std::size_t kMaxSubstreams = 256;  // of all cards together; the others are left out
+  static constexpr std::size_t kMaxKept = 4 * kMaxSubstreams;  // records; past them all are forgotten
 
   // Below `root` are /proc/asound and /sys/class/sound; empty for the real ones. `log` outlives this.
   KernelSoundChannels(const std::string& root, const LogCategory& log)
@@ -66,8 +66,8 @@ class KernelSoundChannels {
   const std::string devices_;
   const LogCategory& log_;
   std::mutex mutex_;                  // guards what follows
-  std::set<std::string> complaints_;  // the paths that were logged, at most kMostSubstreams
-  std::map<ChanmeterKey, std::shared_ptr<const ChanmeterRecord>> latest_;  // at most kMostKept
+  std::set<std::string> complaints_;  // the paths that were logged, at most kMaxSubstreams
+  std::map<ChanmeterKey, std::shared_ptr<const ChanmeterRecord>> latest_;  // at most kMaxKept
 };
 
 }  // namespace tonewerk

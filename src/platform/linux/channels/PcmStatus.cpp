@@ -40,9 +40,9 @@ std::optional<std::int64_t> integerIn(std::optional<std::string_view> text) {
 
 // Of "seconds.fraction", the fraction of as many digits as the kernel likes.
 std::optional<std::int64_t> millisecondsIn(std::optional<std::string_view> text) {
-  constexpr std::int64_t kMostSeconds = std::numeric_limits<std::int64_t>::max() / 1000 - 1;
+  constexpr std::int64_t kMaxSeconds = std::numeric_limits<std::int64_t>::max() / 1000 - 1;
   const std::optional<std::int64_t> seconds = integerIn(text);
-  if (!seconds || *seconds < 0 || *seconds > kMostSeconds) return std::nullopt;
+  if (!seconds || *seconds < 0 || *seconds > kMaxSeconds) return std::nullopt;
   const std::size_t point = std::min(text->find('.'), text->size() - 1);
   std::string digits(text->substr(point + 1, 3));
   digits.resize(3, '0');

@@ -66,7 +66,7 @@ std::vector<std::string> PublishedChannels::fileNames(std::optional<ChanmeterErr
   std::size_t entries = 0;
   std::error_code failure;
   std::filesystem::directory_iterator entry(directory_, failure);
-  for (const std::filesystem::directory_iterator end; !failure && entry != end && entries < kMostEntries;
+  for (const std::filesystem::directory_iterator end; !failure && entry != end && entries < kMaxEntries;
        entry.increment(failure)) {
     ++entries;
     std::string name = entry->path().filename().string();
@@ -76,14 +76,14 @@ std::vector<std::string> PublishedChannels::fileNames(std::optional<ChanmeterErr
 
   ChannelFileProblem problem;
   if (failure && failure != std::errc::no_such_file_or_directory) problem = problemOf(failure);
-  if (entries == kMostEntries && entry != std::filesystem::directory_iterator()) {
-    problem = {kChannelsTooMany, "holds more than " + std::to_string(kMostEntries) +
+  if (entries == kMaxEntries && entry != std::filesystem::directory_iterator()) {
+    problem = {kChannelsTooMany, "holds more than " + std::to_string(kMaxEntries) +
                                      " entries, of which the others are left out"};
   }
-  if (names.size() > kMostFiles) {
-    problem = {kChannelsTooMany, "holds more than " + std::to_string(kMostFiles) +
-                                     " channel files; left out is all from " + names[kMostFiles] + " on"};
-    names.resize(kMostFiles);
+  if (names.size() > kMaxFiles) {
+    problem = {kChannelsTooMany, "holds more than " + std::to_string(kMaxFiles) +
+                                     " channel files; left out is all from " + names[kMaxFiles] + " on"};
+    names.resize(kMaxFiles);
   }
   complain(directory_, problem, loggedOfDirectory_);
   if (problem.code != 0) error = ChanmeterError{problem.code};
@@ -106,15 +106,15 @@ ChannelFileProblem PublishedChannels::refresh(const std::string& path, File& fil
     return error == std::errc::no_such_file_or_directory ? ChannelFileProblem() : problemOf(error);
   }
   const auto size = static_cast<std::size_t>(status.st_size);
-  if (S_ISREG(status.st_mode) && size <= kMostFileBytes) sums.bytes += size;
-  if (sums.bytes > kMostBytes) {
+  if (S_ISREG(status.st_mode) && size <= kMaxFileBytes) sums.bytes += size;
+  if (sums.bytes > kMaxBytes) {
     file.letGo();  // it may have been read when there were fewer files before it
-    return pastBound(kMostBytes, "bytes");
+    return pastBound(kMaxBytes, "bytes");
   }
 
   if (!file.stamp || FileStamp::of(status) != *file.stamp) readAgain(path, file);
   sums.channels += file.records.size();
-  if (sums.channels > kMostChannels) return pastBound(kMostChannels, "channels");
+  if (sums.channels > kMaxChannels) return pastBound(kMaxChannels, "channels");
   return file.problem;
 }
 
@@ -129,7 +129,7 @@ void PublishedChannels::readAgain(const std::string& path, File& file) {
   std::string text;
   FileStamp stamp{};
   file.stamp.reset();
-  if (const std::error_code error = readWholeFile(path, kMostFileBytes, text, stamp)) {
+  if (const std::error_code error = readWholeFile(path, kMaxFileBytes, text, stamp)) {
     file.letGo();
     file.problem = error == std::errc::no_such_file_or_directory ? ChannelFileProblem() : problemOf(error);
     return;

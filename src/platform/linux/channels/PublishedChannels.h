@@ -24,12 +24,12 @@ namespace tonewerk {
 // Any thread; one reads at a time.
 class PublishedChannels {
  public:
-  static constexpr std::size_t kMostFileBytes = std::size_t{1} << 20;
+  static constexpr std::size_t kMaxFileBytes = std::size_t{1} << 20;
   // In the whole directory. What comes after, in the order of names, is left out.
-  static constexpr std::size_t kMostEntries = 4096;  // of whatever name
-  static constexpr std::size_t kMostFiles = 256;
-  static constexpr std::size_t kMostBytes = std::size_t{8} << 20;
-  static constexpr std::size_t kMostChannels = 32768;
+  static constexpr std::size_t kMaxEntries = 4096;  // of whatever name
+  static constexpr std::size_t kMaxFiles = 256;
+  static constexpr std::size_t kMaxBytes = std::size_t{8} << 20;
+  static constexpr std::size_t kMaxChannels = 32768;
 
   // `log` outlives this. Without a directory there are no channels.
   PublishedChannels(std::string directory, const LogCategory& log)

@@ -123,8 +123,8 @@ class RunningProgram {
     for (;;) {
       const auto left = std::chrono::ceil<std::chrono::milliseconds>(deadline - Clock::now());
       if (left.count() <= 0) return false;
-      constexpr long kMost = 60'000;
-      const int count = poll(waited.data(), waited.size(), static_cast<int>(std::min(left.count(), kMost)));
+      constexpr long kMax = 60'000;
+      const int count = poll(waited.data(), waited.size(), static_cast<int>(std::min(left.count(), kMax)));
       if (count > 0) return true;
     }
   }

@@ -118,7 +118,7 @@ class ValueReader {
 
   bool count(std::size_t bytes) {
     bytes_ += bytes;
-    return bytes_ <= kMostFrameBytes || fail("makes the message longer than 1048576 bytes", true);
+    return bytes_ <= kMaxFrameBytes || fail("makes the message longer than 1048576 bytes", true);
   }
 
   template <typename T>
@@ -159,7 +159,7 @@ class ValueReader {
   }
   bool leave() { return !hasFailed() && (sd_bus_message_exit_container(message_) >= 0 || malformed()); }
   bool isDeepEnough(std::size_t depth) {
-    return depth <= kMostFrameDepth || fail("is nested deeper than 32", true);
+    return depth <= kMaxFrameDepth || fail("is nested deeper than 32", true);
   }
   // More elements in the array that was entered last.
   bool hasMore() {
@@ -220,8 +220,8 @@ class ValueReader {
 
   // As the socket's reader has it: unsigned only where it must be.
   static Value unsignedInteger(std::uint64_t number) {
-    constexpr auto kMostSigned = static_cast<std::uint64_t>(std::numeric_limits<std::int64_t>::max());
-    return number > kMostSigned ? Value(number) : Value(static_cast<std::int64_t>(number));
+    constexpr auto kMaxSigned = static_cast<std::uint64_t>(std::numeric_limits<std::int64_t>::max());
+    return number > kMaxSigned ? Value(number) : Value(static_cast<std::int64_t>(number));
   }
 
   Value date(const std::string& contents) {

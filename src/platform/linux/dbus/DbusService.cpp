@@ -218,7 +218,7 @@ std::optional<ReplyError> DbusService::request(sd_bus_message* call, const DbusI
 DbusService::Client* DbusService::clientNamed(const std::string& name) {
   const auto found = clients_.find(name);
   if (found != clients_.end()) return found->second.get();
-  if (clients_.size() >= kMostClients) return nullptr;
+  if (clients_.size() >= kMaxClients) return nullptr;
   const std::uint64_t identifier = nextIdentifier_++;
   std::unique_ptr<Client> client(
       new Client{*this, identifier, DbusConnection(context_, identifier, name), name, nullptr, nullptr});

@@ -30,7 +30,7 @@ struct DbusNames {
 class DbusService {
  public:
   // Clients at once. Each takes a match rule of the bus, of which a system bus grants 512.
-  static constexpr std::size_t kMostClients = 256;
+  static constexpr std::size_t kMaxClients = 256;
 
   enum class End {
     kStopped,  // somebody set `isStopping`

@@ -19,7 +19,7 @@ std::int64_t CapturePolicy::dayOf(const Clock& clock) {
 FaultsignError CapturePolicy::judge(const FaultsignSignature& signature, double duration) {
   if (!isValid(signature, duration)) return kFaultsignErrorInvalidParameters;
   beginDay();
-  if (count_.accepted >= kMostADay) return kFaultsignErrorDailyLimitExceeded;
+  if (count_.accepted >= kMaxADay) return kFaultsignErrorDailyLimitExceeded;
   forgetOld();
   if (accepted_.contains(keyOf(signature))) return kFaultsignErrorRequestThrottled;
   return kFaultsignErrorNone;

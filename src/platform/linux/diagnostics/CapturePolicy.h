@@ -18,7 +18,7 @@ class Clock;
 class CapturePolicy {
  public:
   // Accepted in one day of UTC, captures that were cancelled later included.
-  static constexpr std::int64_t kMostADay = 20;
+  static constexpr std::int64_t kMaxADay = 20;
   // Between two of one signature, from acceptance to acceptance. One that was cancelled puts nothing off.
   static constexpr std::chrono::seconds kMinimumInterval{60};
   // Of a session, seconds.

@@ -41,7 +41,7 @@ CaptureSessions::Outcome CaptureSessions::start(const CaptureRequest& request) {
   const std::lock_guard lock(mutex_);
   if (isFinished_) return {kFaultsignErrorServiceUnavailable};
   if (const FaultsignError error = policy_.judge(request.signature, request.duration)) return {error};
-  if (pending_.size() >= kMostPending) return {kFaultsignErrorServiceUnavailable};
+  if (pending_.size() >= kMaxPending) return {kFaultsignErrorServiceUnavailable};
   const CapturePolicy::Acceptance acceptance = policy_.accept(request.signature);
   std::string identifier = identifiers_.next(clock_.now());
   // The tick waits for the lock, so it finds what is being put here.

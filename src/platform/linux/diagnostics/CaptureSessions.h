@@ -40,7 +40,7 @@ class CaptureSessions : public std::enable_shared_from_this<CaptureSessions> {
  public:
   // As many as two days' captures, which is what the longest duration can bring together: the day's number is
   // what a symptom meets, not this.
-  static constexpr std::size_t kMostPending = 2 * CapturePolicy::kMostADay;
+  static constexpr std::size_t kMaxPending = 2 * CapturePolicy::kMaxADay;
 
   // Makes the capture; false when there is no room for it. On any thread; never waits and never comes back
   // here.

@@ -33,8 +33,8 @@ class Epoll {
   // Waits until something is ready or the time is up; without a time-out as long as it takes. The events are
   // valid until the next call; none when the time is up or a signal came.
   std::span<const Event> wait(std::optional<std::chrono::milliseconds> timeout) {
-    std::array<epoll_event, kMostAtOnce> ready;
-    const int count = ::epoll_wait(descriptor_.get(), ready.data(), kMostAtOnce,
+    std::array<epoll_event, kMaxAtOnce> ready;
+    const int count = ::epoll_wait(descriptor_.get(), ready.data(), kMaxAtOnce,
                                    timeout ? static_cast<int>(timeout->count()) : -1);
     std::size_t kept = 0;
     for (; count > 0 && kept < static_cast<std::size_t>(count); ++kept) {
@@ -44,7 +44,7 @@ class Epoll {
   }
 
  private:
-  static constexpr int kMostAtOnce = 64;
+  static constexpr int kMaxAtOnce = 64;
 
   bool control(int operation, int descriptor, std::uint64_t identifier, std::uint32_t events) {
     epoll_event event{};
@@ -54,7 +54,7 @@ class Epoll {
   }
 
   FileDescriptor descriptor_;
-  std::array<Event, kMostAtOnce> events_{};
+  std::array<Event, kMaxAtOnce> events_{};
 };
 
 }  // namespace tonewerk

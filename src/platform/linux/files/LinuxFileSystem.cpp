@@ -102,12 +102,12 @@ class HiddenFile final : public NewFile {
   }
 
  private:
-  static constexpr int kMostAttempts = 8;
+  static constexpr int kMaxAttempts = 8;
 
   // Another process that looks for leftovers may come between the making and the locking; then another file
   // is made. Who comes each time does not look for leftovers.
   std::error_code open() {
-    for (int attempt = 0; attempt < kMostAttempts; ++attempt) {
+    for (int attempt = 0; attempt < kMaxAttempts; ++attempt) {
       const std::error_code error = create();
       if (error && error != std::errc::file_exists) return error;
       if (!error && lock()) return {};

@@ -13,7 +13,7 @@
 namespace tonewerk {
 namespace {
 
-constexpr std::size_t kMostBytes = std::size_t{16} << 20;
+constexpr std::size_t kMaxBytes = std::size_t{16} << 20;
 
 }  // namespace
 
@@ -55,7 +55,7 @@ std::error_code readFileBytes(const std::string& path, std::string& bytes, struc
     if (count < 0) return lastSystemError();
     if (count == 0) return {};
     bytes.append(buffer.data(), static_cast<std::size_t>(count));
-    if (bytes.size() > kMostBytes) return std::make_error_code(std::errc::file_too_large);
+    if (bytes.size() > kMaxBytes) return std::make_error_code(std::errc::file_too_large);
   }
 }
 

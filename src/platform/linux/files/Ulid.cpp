@@ -10,11 +10,11 @@ namespace {
 
 constexpr char kDigits[] = "0123456789ABCDEFGHJKMNPQRSTVWXYZ";
 constexpr int kTimeDigits = 10;
-constexpr std::uint64_t kMostMilliseconds = (std::uint64_t{1} << 48) - 1;
+constexpr std::uint64_t kMaxMilliseconds = (std::uint64_t{1} << 48) - 1;
 
 std::uint64_t millisecondsOf(double seconds) {
   if (!(seconds > 0.0)) return 0;
-  return static_cast<std::uint64_t>(std::min(seconds * 1000.0, static_cast<double>(kMostMilliseconds)));
+  return static_cast<std::uint64_t>(std::min(seconds * 1000.0, static_cast<double>(kMaxMilliseconds)));
 }
 
 UlidGenerator::Random systemRandom() {

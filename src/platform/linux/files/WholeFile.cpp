@@ -43,7 +43,7 @@ bool isSameContent(const FileStamp& a, const FileStamp& b) {
 
 std::error_code readWholeFile(const std::string& path, std::size_t mostBytes, std::string& text,
                               FileStamp& stamp) {
-  for (int attempt = 0; attempt < kMostAttempts; ++attempt) {
+  for (int attempt = 0; attempt < kMaxAttempts; ++attempt) {
     text.clear();
     const FileDescriptor file(open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
     if (!file) return lastSystemError();

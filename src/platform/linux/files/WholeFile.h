@@ -16,10 +16,10 @@ namespace tonewerk {
 //
 // Never waits, whatever stands in the file's place. `text` and `stamp` are of what was read. Fails with
 //   std::errc::file_too_large               over `mostBytes`
-//   std::errc::resource_unavailable_try_again  it moved each of kMostAttempts times
+//   std::errc::resource_unavailable_try_again  it moved each of kMaxAttempts times
 //   std::errc::invalid_argument, is_a_directory  no regular file
 // or the system's error.
-inline constexpr int kMostAttempts = 3;
+inline constexpr int kMaxAttempts = 3;
 [[nodiscard]] std::error_code readWholeFile(const std::string& path, std::size_t mostBytes, std::string& text,
                                             FileStamp& stamp);
 

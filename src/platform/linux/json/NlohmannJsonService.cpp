@@ -12,7 +12,7 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
-constexpr int kMostDepth = 200;
+constexpr int kMaxDepth = 200;
 
 // Where in a tree of values one stands, for words about it: "a.b[2]".
 class Path {
@@ -137,13 +137,13 @@ std::optional<Value> mapOf(const Json& json, Path& path, std::string& problem) {
 }
 
 Value integerOf(std::uint64_t number) {
-  constexpr auto kMostSigned = static_cast<std::uint64_t>(std::numeric_limits<std::int64_t>::max());
-  return number > kMostSigned ? Value(number) : Value(static_cast<std::int64_t>(number));
+  constexpr auto kMaxSigned = static_cast<std::uint64_t>(std::numeric_limits<std::int64_t>::max());
+  return number > kMaxSigned ? Value(number) : Value(static_cast<std::int64_t>(number));
 }
 
 std::optional<Value> valueOf(const Json& json, Path& path, std::string& problem) {
-  if (path.depth() > kMostDepth) {
-    problem = "values are nested deeper than " + std::to_string(kMostDepth);
+  if (path.depth() > kMaxDepth) {
+    problem = "values are nested deeper than " + std::to_string(kMaxDepth);
     return std::nullopt;
   }
   switch (json.type()) {

@@ -13,7 +13,7 @@ namespace tonewerk {
 namespace {
 
 // How long a line waits for a full, non-blocking pipe before it is lost.
-constexpr int kMostWaitMilliseconds = 100;
+constexpr int kMaxWaitMilliseconds = 100;
 
 std::string timeText(double at) {
   const double whole = std::floor(at);
@@ -30,7 +30,7 @@ std::string timeText(double at) {
 
 bool becomesWritable(int fileDescriptor) {
   pollfd waited{fileDescriptor, POLLOUT, 0};
-  return poll(&waited, 1, kMostWaitMilliseconds) == 1;
+  return poll(&waited, 1, kMaxWaitMilliseconds) == 1;
 }
 
 void writeAll(int fileDescriptor, std::string_view text) {

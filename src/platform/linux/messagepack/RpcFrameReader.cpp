@@ -52,7 +52,7 @@ class RpcFrameReader::Parser {
     for (;;) {
       if (parser_->nonparsed_size() > 0 && parse()) return endFrame();
       if (!visitor_.problem().empty()) return Result::kBroken;
-      if (parser_->message_size() > kMostFrameBytes) return tooLong();
+      if (parser_->message_size() > kMaxFrameBytes) return tooLong();
       if (bytes.empty()) return Result::kNeedsMore;
       feed(bytes);
     }
@@ -78,7 +78,7 @@ class RpcFrameReader::Parser {
 
   Result endFrame() {
     visitor_.frame().wireBytes = parser_->parsed_size();
-    if (visitor_.frame().wireBytes > kMostFrameBytes) return tooLong();
+    if (visitor_.frame().wireBytes > kMaxFrameBytes) return tooLong();
     isFrameDone_ = true;
     return Result::kFrame;
   }

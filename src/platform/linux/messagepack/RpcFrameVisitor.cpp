@@ -13,12 +13,12 @@ namespace tonewerk {
 namespace {
 
 // Room made for what a header claims, at most: the rest is made as it comes.
-constexpr std::uint32_t kMostReserved = 64;
+constexpr std::uint32_t kMaxReserved = 64;
 // A map among the arguments is mostly a message, to which its session adds some entries of its own.
 constexpr std::size_t kMessageDepth = 3;
 constexpr std::uint32_t kRoomForAdditions = 3;
 // No method takes as many. More are refused, so that a frame of empty arguments does not become a vast list.
-constexpr std::size_t kMostArguments = 16;
+constexpr std::size_t kMaxArguments = 16;
 
 // Of a response's array.
 constexpr std::size_t kErrorPlace = 2;
@@ -53,7 +53,7 @@ void RpcFrameVisitor::init() {
 
 bool RpcFrameVisitor::visit_nil() {
   if (isInArguments()) {
-    if (frame_.arguments.size() >= kMostArguments) return refuse("is one too many");
+    if (frame_.arguments.size() >= kMaxArguments) return refuse("is one too many");
     frame_.arguments.emplace_back();
     return true;
   }
@@ -68,8 +68,8 @@ bool RpcFrameVisitor::visit_nil() {
 }
 
 bool RpcFrameVisitor::visit_positive_integer(std::uint64_t value) {
-  constexpr auto kMostSigned = static_cast<std::uint64_t>(std::numeric_limits<std::int64_t>::max());
-  if (value > kMostSigned) return put(Value(value));
+  constexpr auto kMaxSigned = static_cast<std::uint64_t>(std::numeric_limits<std::int64_t>::max());
+  if (value > kMaxSigned) return put(Value(value));
   return put(Value(static_cast<std::int64_t>(value)));
 }
 
@@ -152,11 +152,11 @@ bool RpcFrameVisitor::open(bool isMap, std::uint32_t count) {
     return broken(isMap ? "a map in a frame's place for something else"
                         : "an array in a frame's place for something else");
   }
-  if (depth_ == kMostFrameDepth) return broken("a frame nested too deep");
+  if (depth_ == kMaxFrameDepth) return broken("a frame nested too deep");
   Container& container = containers_[depth_++];
   container.isMap = isMap;
   container.awaitsKey = false;
-  const std::uint32_t room = std::min(count, kMostReserved);
+  const std::uint32_t room = std::min(count, kMaxReserved);
   container.map = {};
   container.values = {};
   container.keyBits = 0;
@@ -176,7 +176,7 @@ bool RpcFrameVisitor::startFrame(std::uint32_t count) {
 }
 
 bool RpcFrameVisitor::startArguments(std::uint32_t count) {
-  frame_.arguments.reserve(std::min<std::size_t>(count, kMostArguments));
+  frame_.arguments.reserve(std::min<std::size_t>(count, kMaxArguments));
   isReadingArguments_ = true;
   depth_ = 2;
   return true;
@@ -185,7 +185,7 @@ bool RpcFrameVisitor::startArguments(std::uint32_t count) {
 bool RpcFrameVisitor::put(Value value) {
   if (depth_ <= 1) return putInFrame(std::move(value));
   if (isInArguments()) {
-    if (frame_.arguments.size() >= kMostArguments) return refuse("is one too many");
+    if (frame_.arguments.size() >= kMaxArguments) return refuse("is one too many");
     frame_.arguments.emplace_back(std::move(value));
     return true;
   }
@@ -269,7 +269,7 @@ bool RpcFrameVisitor::putKey(std::string_view text) {
 bool RpcFrameVisitor::refuse(const char* what) {
   if (!frame_.refused) frame_.refused = RefusedValue{frame_.arguments.size(), what};
   // A stand-in, so that what follows falls into the right places.
-  if (isInArguments() && frame_.arguments.size() < kMostArguments) frame_.arguments.emplace_back(Value());
+  if (isInArguments() && frame_.arguments.size() < kMaxArguments) frame_.arguments.emplace_back(Value());
   return true;
 }
 

@@ -90,7 +90,7 @@ class RpcFrameVisitor {
   std::size_t frameSize_ = 0;   // elements of the frame's array
   std::size_t framePlace_ = 0;  // the element that comes next
   bool isReadingArguments_ = false;
-  std::array<Container, kMostFrameDepth> containers_;
+  std::array<Container, kMaxFrameDepth> containers_;
 };
 
 }  // namespace tonewerk

@@ -123,7 +123,7 @@ void RpcWriter::response(std::uint32_t identifier, const std::optional<ReplyErro
 bool fitsFrameDepth(const Arguments& arguments) {
   constexpr std::size_t kFrameAndArguments = 2;
   return std::all_of(arguments.begin(), arguments.end(), [](const Argument& argument) {
-    return !argument || nestsWithin(*argument, kMostFrameDepth - kFrameAndArguments);
+    return !argument || nestsWithin(*argument, kMaxFrameDepth - kFrameAndArguments);
   });
 }
 

@@ -18,8 +18,8 @@ InFlightToken RequestWindow::start(std::size_t bytes) {
 }
 
 bool RequestWindow::isBelowBound(std::size_t otherBytes) const {
-  return startedRequests_ - knownFinishedRequests_ < kMostUnfinishedRequests &&
-         startedBytes_ - knownFinishedBytes_ + otherBytes < kMostUnfinishedBytes;
+  return startedRequests_ - knownFinishedRequests_ < kMaxUnfinishedRequests &&
+         startedBytes_ - knownFinishedBytes_ + otherBytes < kMaxUnfinishedBytes;
 }
 
 bool RequestWindow::hasRoom(std::size_t otherBytes) {

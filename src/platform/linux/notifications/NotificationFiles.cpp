@@ -51,7 +51,7 @@ std::optional<std::uint64_t> parseState(std::string_view text) {
 }
 
 // As much of the file as `buffer` takes.
-std::string_view readInto(std::array<char, NotificationFiles::kMostStateBytes + 1>& buffer, int file,
+std::string_view readInto(std::array<char, NotificationFiles::kMaxStateBytes + 1>& buffer, int file,
                           std::error_code& error) {
   std::size_t size = 0;
   while (size < buffer.size()) {
@@ -97,10 +97,10 @@ std::optional<std::uint64_t> NotificationFiles::state(std::string_view name, std
   }
   const FileDescriptor file = openRegularFile(pathOf(name), O_RDONLY, error);
   if (!file) return std::nullopt;
-  std::array<char, kMostStateBytes + 1> buffer{};
+  std::array<char, kMaxStateBytes + 1> buffer{};
   const std::string_view text = readInto(buffer, file.get(), error);
   if (error) return std::nullopt;
-  const std::optional<std::uint64_t> state = text.size() > kMostStateBytes ? std::nullopt : parseState(text);
+  const std::optional<std::uint64_t> state = text.size() > kMaxStateBytes ? std::nullopt : parseState(text);
   if (!state) error = std::make_error_code(std::errc::result_out_of_range);
   return state;
 }

@@ -17,7 +17,7 @@ namespace tonewerk {
 class NotificationFiles {
  public:
   // Spaces around the number included.
-  static constexpr std::size_t kMostStateBytes = 64;
+  static constexpr std::size_t kMaxStateBytes = 64;
 
   explicit NotificationFiles(std::string directory) : directory_(std::move(directory)) {}
 

@@ -10,7 +10,7 @@
 namespace tonewerk {
 namespace {
 
-constexpr std::size_t kMostHeaderBytes = std::size_t{64} << 10;
+constexpr std::size_t kMaxHeaderBytes = std::size_t{64} << 10;
 constexpr std::string_view kRetryAfter = "retry-after:";
 constexpr int kPollMilliseconds = 1000;
 
@@ -35,7 +35,7 @@ std::size_t takeHeader(char* data, std::size_t size, std::size_t count, void* he
   auto& arrival = *static_cast<Arrival*>(held);
   const std::string_view line(data, size * count);
   arrival.headerBytes += line.size();
-  if (arrival.headerBytes > kMostHeaderBytes) return 0;
+  if (arrival.headerBytes > kMaxHeaderBytes) return 0;
   if (beginsWithName(line, kRetryAfter)) arrival.answer.retryAfter = line.substr(kRetryAfter.size());
   return line.size();
 }
@@ -43,7 +43,7 @@ std::size_t takeHeader(char* data, std::size_t size, std::size_t count, void* he
 std::size_t takeBody(char* data, std::size_t size, std::size_t count, void* held) {
   std::string& body = static_cast<Arrival*>(held)->answer.body;
   const std::size_t bytes = size * count;
-  const std::size_t room = HttpAnswer::kMostBodyBytes - body.size();
+  const std::size_t room = HttpAnswer::kMaxBodyBytes - body.size();
   if (bytes > room) {
     body.append(data, room);
     return 0;

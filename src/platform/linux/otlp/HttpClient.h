@@ -15,7 +15,7 @@ struct HttpRequest {
 
 struct HttpAnswer {
   // What a body is read up to; the rest is not waited for.
-  static constexpr std::size_t kMostBodyBytes = std::size_t{64} << 10;
+  static constexpr std::size_t kMaxBodyBytes = std::size_t{64} << 10;
 
   int status = 0;          // 0 when there was none
   std::string problem;     // why there was none, or why the body is not whole; else empty

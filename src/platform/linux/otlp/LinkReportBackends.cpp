@@ -45,7 +45,7 @@ void LinkReportBackends::add(const std::string& entry) {
   } else if (std::any_of(endpoints.begin(), endpoints.end(),
                          [&](const auto& known) { return known.url == url; })) {
     problems.push_back(shown + " is there twice");
-  } else if (endpoints.size() == kMostEndpoints) {
+  } else if (endpoints.size() == kMaxEndpoints) {
     problems.push_back(shown + " is one address too many");
   } else {
     endpoints.push_back({entry, url});

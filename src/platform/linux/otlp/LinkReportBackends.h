@@ -12,7 +12,7 @@ namespace tonewerk {
 // Where real-time-communication messages go: what the preference "backends" of the domain
 // "com.orvane.linkreport" says, an array of texts: "local", or the base address of an OTLP/HTTP endpoint.
 struct LinkReportBackends {
-  static constexpr std::size_t kMostEndpoints = 8;
+  static constexpr std::size_t kMaxEndpoints = 8;
 
   struct Endpoint {
     std::string base;  // as configured

@@ -20,7 +20,7 @@ namespace {
 constexpr const char* kServiceName = "com.orvane.tonewerk";
 
 // Exporters that sessions once used stay, also when the preference names others later.
-constexpr std::size_t kMostExporters = 2 * LinkReportBackends::kMostEndpoints;
+constexpr std::size_t kMaxExporters = 2 * LinkReportBackends::kMaxEndpoints;
 
 std::function<double()> systemJitter() {
   return [engine = std::mt19937(std::random_device()())]() mutable {
@@ -61,7 +61,7 @@ class LinuxLinkReport::Session final : public LinkReportSession {
   bool sendMessageWithCategory(std::uint16_t category, std::uint16_t type, const ValueMap& payload,
                                std::string& problem) override {
     const std::size_t bytes = payload.bytes();
-    if (bytes > kMostPayloadBytes) {
+    if (bytes > kMaxPayloadBytes) {
       problem = "a payload of " + std::to_string(bytes) + " bytes is too large";
       return false;
     }
@@ -146,8 +146,8 @@ LinkReportBackends LinuxLinkReport::readBackends() {
 OtlpExporter* LinuxLinkReport::exporterFor(const std::string& url) {
   const auto known = exporters_.find(url);
   if (known != exporters_.end()) return known->second.get();
-  if (exporters_.size() >= kMostExporters) {
-    errorLog(log_, "no more than %zu addresses are sent to in one run; left out: %@", kMostExporters, url);
+  if (exporters_.size() >= kMaxExporters) {
+    errorLog(log_, "no more than %zu addresses are sent to in one run; left out: %@", kMaxExporters, url);
     return nullptr;
   }
   auto exporter = std::make_unique<OtlpExporter>(

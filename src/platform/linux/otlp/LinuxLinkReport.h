@@ -33,7 +33,7 @@ class LinuxLinkReport final : public LinkReport {
   static constexpr std::string_view kDeviceIdentifierKey = "device_id";
   static constexpr std::string_view kEventNameAttributeKey = "event_name_attribute";
   // A larger payload, which only a summary can be, is refused.
-  static constexpr std::size_t kMostPayloadBytes = std::size_t{32} << 20;
+  static constexpr std::size_t kMaxPayloadBytes = std::size_t{32} << 20;
 
   using HttpClientMaker = std::function<std::unique_ptr<HttpClient>()>;
 

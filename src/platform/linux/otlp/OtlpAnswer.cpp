@@ -9,7 +9,7 @@ namespace {
 
 using Json = nlohmann::json;
 
-constexpr std::size_t kMostQuoted = 200;
+constexpr std::size_t kMaxQuoted = 200;
 
 // A 64-bit integer is a text in this JSON; a number is understood, too.
 std::optional<std::int64_t> countIn(const Json& json) {
@@ -45,7 +45,7 @@ std::optional<OtlpAnswer> parseOtlpAnswer(std::string_view body) {
 }
 
 std::string quotable(std::string_view text) {
-  std::string quoted(text.substr(0, kMostQuoted));
+  std::string quoted(text.substr(0, kMaxQuoted));
   for (char& c : quoted) {
     const auto byte = static_cast<unsigned char>(c);
     // Bytes beyond ASCII go, too: a cut may have left part of a character.

@@ -61,8 +61,8 @@ void appendMap(std::string& out, const ValueMap& map) {
 }
 
 void appendUnsigned(std::string& out, std::uint64_t number) {
-  constexpr auto kMost = static_cast<std::uint64_t>(std::numeric_limits<std::int64_t>::max());
-  out += number <= kMost ? R"("intValue":")" : R"("stringValue":")";
+  constexpr auto kMax = static_cast<std::uint64_t>(std::numeric_limits<std::int64_t>::max());
+  out += number <= kMax ? R"("intValue":")" : R"("stringValue":")";
   out += std::to_string(number) + '"';
 }
 
@@ -134,8 +134,8 @@ std::size_t addPayload(Attributes& attributes, const ValueMap& payload) {
 }
 
 std::string nanosecondsOf(double seconds) {
-  constexpr double kMostSeconds = 1e10;
-  const double within = seconds > 0.0 ? std::min(seconds, kMostSeconds) : 0.0;
+  constexpr double kMaxSeconds = 1e10;
+  const double within = seconds > 0.0 ? std::min(seconds, kMaxSeconds) : 0.0;
   const double whole = std::floor(within);
   const auto fraction = static_cast<std::uint64_t>(std::llround((within - whole) * 1e9));
   return std::to_string(static_cast<std::uint64_t>(whole) * 1'000'000'000 + fraction);

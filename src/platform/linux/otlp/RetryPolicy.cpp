@@ -11,7 +11,7 @@
 namespace tonewerk {
 namespace {
 
-constexpr std::int64_t kMostSeconds = 1'000'000'000;
+constexpr std::int64_t kMaxSeconds = 1'000'000'000;
 
 std::optional<std::int64_t> secondsIn(std::string_view text) {
   if (text.empty() || !std::all_of(text.begin(), text.end(), [](char c) { return c >= '0' && c <= '9'; })) {
@@ -20,7 +20,7 @@ std::optional<std::int64_t> secondsIn(std::string_view text) {
   std::int64_t seconds = 0;
   const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), seconds);
   // Digits that no integer holds ask for very long.
-  return error == std::errc() ? std::min(seconds, kMostSeconds) : kMostSeconds;
+  return error == std::errc() ? std::min(seconds, kMaxSeconds) : kMaxSeconds;
 }
 
 std::optional<double> timeIn(const std::string& text) {
@@ -71,7 +71,7 @@ std::optional<std::chrono::seconds> parseRetryAfter(std::string_view text, doubl
   if (const auto seconds = secondsIn(value)) return std::chrono::seconds(*seconds);
   const std::optional<double> time = timeIn(std::string(value));
   if (!time) return std::nullopt;
-  const double ahead = std::clamp(std::ceil(*time - now), 0.0, static_cast<double>(kMostSeconds));
+  const double ahead = std::clamp(std::ceil(*time - now), 0.0, static_cast<double>(kMaxSeconds));
   return std::chrono::seconds(static_cast<std::int64_t>(ahead));
 }
 

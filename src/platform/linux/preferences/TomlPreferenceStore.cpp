@@ -19,11 +19,11 @@ namespace tonewerk {
 namespace {
 
 constexpr std::string_view kEnding = ".toml";
-constexpr std::size_t kMostDomainBytes = 200;
+constexpr std::size_t kMaxDomainBytes = 200;
 constexpr unsigned kDirectoryMode = 0755;
 
 bool isDomain(std::string_view domain) {
-  return !domain.empty() && domain.size() <= kMostDomainBytes && domain.front() != '.' &&
+  return !domain.empty() && domain.size() <= kMaxDomainBytes && domain.front() != '.' &&
          domain.find('/') == std::string_view::npos && domain.find('\0') == std::string_view::npos;
 }
 

@@ -69,7 +69,7 @@ bool ProtozeroReader::skip(const Key& key, int groups) {
     case PB::WireType::kStartGroup:
       break;
   }
-  if (groups == kMostGroups) return fail();
+  if (groups == kMaxGroups) return fail();
   while (const auto inner = nextKey()) {
     if (inner->type == PB::WireType::kEndGroup) return inner->tag == key.tag || fail();
     if (!skip(*inner, groups + 1)) return false;

@@ -8,10 +8,10 @@
 namespace tonewerk {
 
 // Reads protocol-buffer bytes. Fit for hostile input: nothing is allocated on a length's word, groups are
-// skipped to kMostGroups deep.
+// skipped to kMaxGroups deep.
 class ProtozeroReader final : public PB::Reader {
  public:
-  static constexpr int kMostGroups = 32;
+  static constexpr int kMaxGroups = 32;
 
   // `bytes` outlives the reader.
   explicit ProtozeroReader(std::string_view bytes) : at_(bytes.data()), end_(bytes.data() + bytes.size()) {}

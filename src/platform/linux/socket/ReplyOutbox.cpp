@@ -11,7 +11,7 @@ namespace tonewerk {
 namespace {
 
 // A buffer that has grown past this is not kept.
-constexpr std::size_t kMostKeptBytes = std::size_t{64} * 1024;
+constexpr std::size_t kMaxKeptBytes = std::size_t{64} * 1024;
 // With so much unsent the connection may have stopped reading requests, and wants to know that it is gone.
 constexpr std::size_t kNotableBytes = std::size_t{64} * 1024;
 
@@ -72,7 +72,7 @@ void ReplyOutbox::sendUnsent() {
   if (state_ != State::kFull) {
     sent_ = 0;
     unsent_.clear();
-    if (unsent_.capacity() > kMostKeptBytes) unsent_ = {};
+    if (unsent_.capacity() > kMaxKeptBytes) unsent_ = {};
   }
   unsentBytes_ = unsent_.size() - sent_;
 }

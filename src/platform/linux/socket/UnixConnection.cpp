@@ -15,7 +15,7 @@ namespace tonewerk {
 namespace {
 
 // Of a method that nobody knows, in the answer that says so.
-constexpr std::size_t kMostMethodNameBytes = 64;
+constexpr std::size_t kMaxMethodNameBytes = 64;
 
 std::string problemText(const Method& method, const RefusedValue& refused) {
   std::string text = std::string(method.name) + ": argument " + std::to_string(refused.argument + 1);
@@ -138,7 +138,7 @@ std::optional<ReplyError> UnixConnection::problemWithFrame(const RpcFrame& frame
                                                            std::optional<std::size_t> method) const {
   if (!method)
     return messagingError(kUnknownMethod,
-                          "unknown method " + std::string(shortened(frame.method, kMostMethodNameBytes)));
+                          "unknown method " + std::string(shortened(frame.method, kMaxMethodNameBytes)));
   const Method& known = interface_->methods[*method];
   if (auto problem = problemWithCaller(known, userIdentifier_, context_.owner)) return problem;
   if (frame.refused) return messagingError(kInvalidArguments, problemText(known, *frame.refused));

@@ -18,7 +18,7 @@ namespace tonewerk {
 namespace {
 
 // Connections accepted in one round, before those that are there have their turn.
-constexpr int kMostAcceptsAtOnce = 16;
+constexpr int kMaxAcceptsAtOnce = 16;
 
 std::size_t descriptorsForClients() {
   rlimit limit{};
@@ -112,7 +112,7 @@ void UnixSocketListener::makeSocketAgain() {
 }
 
 void UnixSocketListener::accept() {
-  for (int count = 0; count < kMostAcceptsAtOnce; ++count) {
+  for (int count = 0; count < kMaxAcceptsAtOnce; ++count) {
     if (connections_.size() >= mostConnections_) return pauseAccepting("too many clients");
     FileDescriptor socket(
         ::accept4(socket_->fileDescriptor(), nullptr, nullptr, SOCK_CLOEXEC | SOCK_NONBLOCK));

@@ -21,7 +21,7 @@ class LinuxSystemInformation final : public SystemInformation {
  public:
   // How old what was read from /sys may be. Sessions often stop together, and reading a sensor can take
   // milliseconds.
-  static constexpr std::chrono::seconds kMostAge{1};
+  static constexpr std::chrono::seconds kMaxAge{1};
 
   // `clock` outlives this. `sysDirectory` and `busAddress` (empty for the system's bus) are where to look,
   // for tests.

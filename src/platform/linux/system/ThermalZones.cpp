@@ -12,7 +12,7 @@
 namespace tonewerk {
 namespace {
 
-constexpr int kMostTripPoints = 64;  // the kernel's own bound is lower
+constexpr int kMaxTripPoints = 64;  // the kernel's own bound is lower
 
 std::optional<std::string> lineOf(const std::string& path) {
   std::string text;
@@ -43,7 +43,7 @@ int levelOfZone(const std::string& zone) {
   const std::optional<int> temperature = temperatureIn(zone + "/temp");
   if (!temperature) return 0;
   int level = 0;
-  for (int number = 0; number < kMostTripPoints; ++number) {
+  for (int number = 0; number < kMaxTripPoints; ++number) {
     const std::string point = zone + "/trip_point_" + std::to_string(number);
     const std::optional<std::string> type = lineOf(point + "_type");
     if (!type) break;

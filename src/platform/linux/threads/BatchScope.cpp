@@ -28,7 +28,7 @@ bool BatchScope::defer(std::shared_ptr<Deferred> ending) {
 }
 
 void BatchScope::pieceHasRun() {
-  if (++pieces_ >= kMostPieces) end();
+  if (++pieces_ >= kMaxPieces) end();
 }
 
 void BatchScope::end() {

@@ -21,7 +21,7 @@ class BatchScope {
   };
 
   // So long does nothing have to wait for others that follow it.
-  static constexpr std::size_t kMostPieces = 32;
+  static constexpr std::size_t kMaxPieces = 32;
 
   BatchScope();
   BatchScope(const BatchScope&) = delete;
@@ -31,7 +31,7 @@ class BatchScope {
   // Puts `ending` off to the end of the calling thread's batch. False when it runs none.
   static bool defer(std::shared_ptr<Deferred> ending);
 
-  // A piece of work has run. Ends the batch, and begins the next, after kMostPieces.
+  // A piece of work has run. Ends the batch, and begins the next, after kMaxPieces.
   void pieceHasRun();
 
  private:

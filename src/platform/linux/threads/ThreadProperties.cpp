@@ -9,8 +9,8 @@
 namespace tonewerk {
 
 void nameThisThread(std::string_view name) {
-  constexpr std::size_t kMost = 15;
-  if (name.size() > kMost) name.remove_prefix(name.size() - kMost);
+  constexpr std::size_t kMax = 15;
+  if (name.size() > kMax) name.remove_prefix(name.size() - kMax);
   pthread_setname_np(pthread_self(), std::string(name).c_str());
 }
 

@@ -12,7 +12,7 @@ namespace tonewerk {
 namespace {
 
 // A burst's memory is given back when the burst is over.
-constexpr std::size_t kMostKeptCapacity = 4096;
+constexpr std::size_t kMaxKeptCapacity = 4096;
 
 // Niceness: ahead of ordinary threads where that is allowed, behind them for what nobody waits for.
 constexpr int kUserInteractiveNiceness = -10;
@@ -66,7 +66,7 @@ void ThreadQueue::run() {
       together.pieceHasRun();
     }
     batch.clear();
-    if (batch.capacity() > kMostKeptCapacity) std::vector<Task>().swap(batch);
+    if (batch.capacity() > kMaxKeptCapacity) std::vector<Task>().swap(batch);
   }
 }
 

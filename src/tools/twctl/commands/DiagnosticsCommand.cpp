@@ -62,9 +62,9 @@ void printField(std::ostream& out, const char* name, const std::string& value) {
 
 // What fits on a screen, cut between characters.
 std::string shortened(const std::string& text) {
-  constexpr std::size_t kMost = 1000;
-  if (text.size() <= kMost) return text;
-  std::size_t end = kMost;
+  constexpr std::size_t kMax = 1000;
+  if (text.size() <= kMax) return text;
+  std::size_t end = kMax;
   while (end > 0 && (static_cast<unsigned char>(text[end]) & 0xC0) == 0x80) --end;
   return text.substr(0, end) + " ...";
 }

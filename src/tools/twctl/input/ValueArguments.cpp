@@ -17,7 +17,7 @@ namespace {
 constexpr std::uint16_t kNamesEnd = 256;
 constexpr int kDomainBits = 16;
 constexpr double kLeastSeconds = 0.05;
-constexpr double kMostSeconds = 86400;
+constexpr double kMaxSeconds = 86400;
 
 template <typename Number>
 std::optional<Number> numberOf(std::string_view text) {
@@ -147,7 +147,7 @@ std::string problemWithCount(const std::string& text) {
 
 std::string problemWithSeconds(const std::string& text) {
   const auto seconds = numberOf<double>(text);
-  const bool isWithin = seconds && *seconds >= kLeastSeconds && *seconds <= kMostSeconds;
+  const bool isWithin = seconds && *seconds >= kLeastSeconds && *seconds <= kMaxSeconds;
   return isWithin ? "" : "\"" + text + "\" is no number of seconds from 0.05 to 86400";
 }
 

@@ -119,17 +119,16 @@ TEST(ChannelDocumentationTest, NamesEveryFailureAndBound) {
     ASSERT_NE(row, std::string::npos) << code;
     EXPECT_THAT(page().substr(row + 1, page().find('\n', row + 1) - row), HasSubstr(words));
   }
-  static_assert(PublishedChannels::kMostFileBytes == std::size_t{1} << 20);
-  static_assert(PublishedChannels::kMostBytes == std::size_t{8} << 20);
-  static_assert(PublishedChannels::kMostChannels == 32768);
-  static_assert(PublishedChannels::kMostEntries == 4096);
+  static_assert(PublishedChannels::kMaxFileBytes == std::size_t{1} << 20);
+  static_assert(PublishedChannels::kMaxBytes == std::size_t{8} << 20);
+  static_assert(PublishedChannels::kMaxChannels == 32768);
+  static_assert(PublishedChannels::kMaxEntries == 4096);
   EXPECT_THAT(page(), HasSubstr("| a file | 1 MiB |"));
-  EXPECT_THAT(page(),
-              HasSubstr("| files | " + std::to_string(PublishedChannels::kMostFiles) + ", and 8 MiB"));
+  EXPECT_THAT(page(), HasSubstr("| files | " + std::to_string(PublishedChannels::kMaxFiles) + ", and 8 MiB"));
   EXPECT_THAT(page(), HasSubstr("| channels | 32,768 "));
   EXPECT_THAT(page(), HasSubstr("| entries of the directory | 4,096,"));
   EXPECT_THAT(page(), HasSubstr("| substreams of sound cards | " +
-                                std::to_string(KernelSoundChannels::kMostSubstreams) + " |"));
+                                std::to_string(KernelSoundChannels::kMaxSubstreams) + " |"));
 }
 
 }  // namespace

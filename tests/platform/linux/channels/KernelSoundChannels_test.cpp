@@ -192,13 +192,13 @@ TEST_F(KernelSoundChannelsTest, SaysOnceWhatItDoesNotUnderstandAndLeavesItOut) {
 }
 
 TEST_F(KernelSoundChannelsTest, ReadsSubstreamsUpToTheBoundAndNotPastIt) {
-  for (std::size_t number = 0; number < KernelSoundChannels::kMostSubstreams - 4; ++number) {
+  for (std::size_t number = 0; number < KernelSoundChannels::kMaxSubstreams - 4; ++number) {
     tree_.addSubstream("card2/pcm0c/sub" + std::to_string(number), "closed\n", "closed\n");
   }
-  EXPECT_THAT(readGroup("Rx"), SizeIs(3 * (KernelSoundChannels::kMostSubstreams - 3)));
+  EXPECT_THAT(readGroup("Rx"), SizeIs(3 * (KernelSoundChannels::kMaxSubstreams - 3)));
   EXPECT_FALSE(error_);
   tree_.addSubstream("card2/pcm1c/sub0", "closed\n", "closed\n");
-  EXPECT_THAT(readGroup("Rx"), SizeIs(3 * (KernelSoundChannels::kMostSubstreams - 3)));
+  EXPECT_THAT(readGroup("Rx"), SizeIs(3 * (KernelSoundChannels::kMaxSubstreams - 3)));
   EXPECT_EQ(error_.value_or(ChanmeterError{}).code, kChannelsTooMany);
   EXPECT_THAT(errors(), SizeIs(1));
 }

@@ -192,7 +192,7 @@ TEST_F(PublishedChannelsTest, FailsForTheSubscribersOfThatDriverOnly) {
 
 TEST_F(PublishedChannelsTest, ReadsAFileOfOneMebibyteAndNoneLarger) {
   std::string text = fileOf("A", channelOf("x"));
-  text.resize(PublishedChannels::kMostFileBytes, ' ');
+  text.resize(PublishedChannels::kMaxFileBytes, ' ');
   publish("a.json", text);
   EXPECT_THAT(readAll(), SizeIs(1));
   publish("a.json", text + " ");
@@ -236,14 +236,14 @@ TEST_F(PublishedChannelsTest, FollowsALinkToAFile) {
 }
 
 TEST_F(PublishedChannelsTest, ReadsFilesUpToTheirBoundAndNotPastIt) {
-  for (std::size_t number = 0; number < PublishedChannels::kMostFiles; ++number) {
+  for (std::size_t number = 0; number < PublishedChannels::kMaxFiles; ++number) {
     const std::string digits = std::to_string(1000 + number);
     publish(digits + ".json", fileOf(digits, channelOf("x")));
   }
-  EXPECT_THAT(readAll(), SizeIs(PublishedChannels::kMostFiles));
+  EXPECT_THAT(readAll(), SizeIs(PublishedChannels::kMaxFiles));
   EXPECT_EQ(code(), 0);
   publish("9999.json", fileOf("late", channelOf("x")));
-  EXPECT_THAT(readAll(), SizeIs(PublishedChannels::kMostFiles));
+  EXPECT_THAT(readAll(), SizeIs(PublishedChannels::kMaxFiles));
   EXPECT_EQ(code(), kChannelsTooMany);
   EXPECT_THAT(errors(), ElementsAre(channels() +
                                     ": holds more than 256 channel files; left out is all from 9999.json on "
@@ -252,7 +252,7 @@ TEST_F(PublishedChannelsTest, ReadsFilesUpToTheirBoundAndNotPastIt) {
 }
 
 TEST_F(PublishedChannelsTest, LooksAtEntriesUpToTheirBoundAndNotPastIt) {
-  for (std::size_t number = 0; number < PublishedChannels::kMostEntries; ++number) {
+  for (std::size_t number = 0; number < PublishedChannels::kMaxEntries; ++number) {
     std::ofstream(path(std::to_string(number)));
   }
   readAll();
@@ -268,8 +268,8 @@ TEST_F(PublishedChannelsTest, LooksAtEntriesUpToTheirBoundAndNotPastIt) {
 
 TEST_F(PublishedChannelsTest, ReadsBytesUpToTheirBoundAndNotPastIt) {
   std::string text = fileOf("A", channelOf("x"));
-  text.resize(PublishedChannels::kMostFileBytes, ' ');
-  const std::size_t files = PublishedChannels::kMostBytes / PublishedChannels::kMostFileBytes;
+  text.resize(PublishedChannels::kMaxFileBytes, ' ');
+  const std::size_t files = PublishedChannels::kMaxBytes / PublishedChannels::kMaxFileBytes;
   for (std::size_t number = 0; number < files; ++number) publish(std::to_string(number) + ".json", text);
   EXPECT_THAT(readAll(), SizeIs(files));
   EXPECT_EQ(code(), 0);
@@ -291,8 +291,8 @@ TEST_F(PublishedChannelsTest, LetsGoOfAFileThatOthersHavePushedPastTheBound) {
   const std::weak_ptr<const ChanmeterRecord> record = readAll().at(0);
   EXPECT_FALSE(record.expired());
   std::string text = fileOf("A", channelOf("x"));
-  text.resize(PublishedChannels::kMostFileBytes, ' ');
-  const std::size_t files = PublishedChannels::kMostBytes / PublishedChannels::kMostFileBytes;
+  text.resize(PublishedChannels::kMaxFileBytes, ' ');
+  const std::size_t files = PublishedChannels::kMaxBytes / PublishedChannels::kMaxFileBytes;
   for (std::size_t number = 0; number < files; ++number) publish(std::to_string(number) + ".json", text);
   EXPECT_THAT(readAll(), SizeIs(files));
   EXPECT_EQ(code(), kChannelsTooMany);
@@ -302,12 +302,12 @@ TEST_F(PublishedChannelsTest, LetsGoOfAFileThatOthersHavePushedPastTheBound) {
 }
 
 TEST_F(PublishedChannelsTest, GivesChannelsUpToTheirBoundAndNotPastIt) {
-  publish("a.json", manyChannels(PublishedChannels::kMostChannels / 2));
-  publish("b.json", manyChannels(PublishedChannels::kMostChannels / 2));
-  EXPECT_THAT(readAll(), SizeIs(PublishedChannels::kMostChannels));
+  publish("a.json", manyChannels(PublishedChannels::kMaxChannels / 2));
+  publish("b.json", manyChannels(PublishedChannels::kMaxChannels / 2));
+  EXPECT_THAT(readAll(), SizeIs(PublishedChannels::kMaxChannels));
   EXPECT_EQ(code(), 0);
   publish("c.json", manyChannels(1));
-  EXPECT_THAT(readAll(), SizeIs(PublishedChannels::kMostChannels));
+  EXPECT_THAT(readAll(), SizeIs(PublishedChannels::kMaxChannels));
   EXPECT_EQ(code(), kChannelsTooMany);
   EXPECT_THAT(errors(), ElementsAre(path("c.json") +
                                     ": goes past the 32768 channels that all files together may "

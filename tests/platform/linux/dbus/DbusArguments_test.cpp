@@ -101,7 +101,7 @@ class ReadingEnd {
 
 // Text is UTF-8, dates are numbers, nothing is deeper than it may be.
 void expectSound(const Value& value, std::size_t depth) {
-  ASSERT_LE(depth, kMostFrameDepth);
+  ASSERT_LE(depth, kMaxFrameDepth);
   const SharedString* text = value.asString();
   EXPECT_TRUE(text == nullptr || isUtf8(*text));
   const Date* date = value.asDate();

@@ -298,9 +298,9 @@ BusMessage nestedCall(DbusCaller& caller, int arrays) {
 
 TEST_F(DbusListenerTest, TakesValuesAsDeepAsTheSocketDoesAndNoDeeper) {
   DbusCaller caller(bus.address(), kNames);
-  constexpr int kMostArrays = 29;  // the map is as deep as a frame's third container, of 32
-  EXPECT_EQ(caller.ask(nestedCall(caller, kMostArrays)).error, "");
-  const DbusReceived answer = caller.ask(nestedCall(caller, kMostArrays + 1));
+  constexpr int kMaxArrays = 29;  // the map is as deep as a frame's third container, of 32
+  EXPECT_EQ(caller.ask(nestedCall(caller, kMaxArrays)).error, "");
+  const DbusReceived answer = caller.ask(nestedCall(caller, kMaxArrays + 1));
   EXPECT_EQ(answer.error, SD_BUS_ERROR_LIMITS_EXCEEDED) << answer.text;
   EXPECT_EQ(answer.text, "TakeMap: argument 1 (map) is nested deeper than 32");
   EXPECT_TRUE(isServed(caller));
@@ -445,11 +445,11 @@ TEST_F(DbusListenerTest, DescribesItselfCompletely) {
 TEST_F(DbusListenerTest, RefusesRequestsOfAClientPastTheBoundUntilSomeHaveFinished) {
   DbusCaller busy(bus.address(), kNames);
   DbusCaller other(bus.address(), kNames);
-  for (std::size_t at = 0; at < kMostUnfinishedRequests; ++at) {
+  for (std::size_t at = 0; at < kMaxUnfinishedRequests; ++at) {
     busy.send(busy.newCall("Hold", "x", static_cast<std::int64_t>(at)));
   }
   ASSERT_GE(sd_bus_flush(busy.bus()), 0);
-  ASSERT_TRUE(record.waitForHeld(kMostUnfinishedRequests));
+  ASSERT_TRUE(record.waitForHeld(kMaxUnfinishedRequests));
   const DbusReceived answer = busy.ask("TakeInt64", "x", std::int64_t{1});
   EXPECT_EQ(answer.error, SD_BUS_ERROR_LIMITS_EXCEEDED);
   EXPECT_EQ(answer.text, "too many requests of this client are under way");
@@ -462,14 +462,14 @@ TEST_F(DbusListenerTest, RefusesRequestsOfAClientPastTheBoundUntilSomeHaveFinish
 
 TEST_F(DbusListenerTest, DoesNotCountAHeldAnswerAsUnfinished) {
   DbusCaller caller(bus.address(), kNames);
-  for (std::size_t at = 0; at <= kMostUnfinishedRequests; ++at) {
+  for (std::size_t at = 0; at <= kMaxUnfinishedRequests; ++at) {
     caller.send(caller.newCall("HoldReply", "x", static_cast<std::int64_t>(at)));
   }
   ASSERT_GE(sd_bus_flush(caller.bus()), 0);
-  ASSERT_TRUE(record.waitForHeld(kMostUnfinishedRequests + 1));
+  ASSERT_TRUE(record.waitForHeld(kMaxUnfinishedRequests + 1));
   EXPECT_TRUE(isServed(caller));
   for (auto& [reply, token] : record.takeHeld()) reply(std::nullopt, Value(true));
-  EXPECT_TRUE(caller.waitForReceived(kMostUnfinishedRequests + 1));
+  EXPECT_TRUE(caller.waitForReceived(kMaxUnfinishedRequests + 1));
 }
 
 TEST_F(DbusListenerTest, RefusesRequestsWhoseBytesWouldPassTheBound) {
@@ -489,7 +489,7 @@ TEST_F(DbusListenerTest, RefusesRequestsWhoseBytesWouldPassTheBound) {
 
 TEST_F(DbusListenerTest, RefusesOneClientTooManyUntilAnotherHasGone) {
   std::vector<std::unique_ptr<DbusCaller>> callers;
-  for (std::size_t at = 0; at < DbusService::kMostClients; ++at) {
+  for (std::size_t at = 0; at < DbusService::kMaxClients; ++at) {
     callers.push_back(std::make_unique<DbusCaller>(bus.address(), kNames));
     ASSERT_TRUE(isServed(*callers.back()));
   }
@@ -498,7 +498,7 @@ TEST_F(DbusListenerTest, RefusesOneClientTooManyUntilAnotherHasGone) {
   EXPECT_EQ(answer.error, SD_BUS_ERROR_LIMITS_EXCEEDED);
   EXPECT_EQ(answer.text, "the service has too many clients");
   callers.pop_back();
-  ASSERT_TRUE(record.waitForEvents(DbusService::kMostClients + 3));
+  ASSERT_TRUE(record.waitForEvents(DbusService::kMaxClients + 3));
   EXPECT_TRUE(isServed(late));
 }
 

@@ -440,7 +440,7 @@ class LinuxFileSystemCallTest : public testing::Test {
   }
 
   // More often than this no call is made to fail, so that no defect makes a test endless.
-  static constexpr int kMostCalls = 100;
+  static constexpr int kMaxCalls = 100;
   TemporaryDirectory directory;
   std::error_code error;
   int calls = 0;
@@ -451,7 +451,7 @@ TEST_F(LinuxFileSystemCallTest, WritesWhereNoFileCanBeLockedAndLeavesLeftovers) 
   std::ofstream(directory.path(".new-1")) << "left";
   for (const int failure : {ENOLCK, EOPNOTSUPP}) {
     calls = 0;
-    write(SYS_flock, [&](const seccomp_data&) { return ++calls <= kMostCalls ? failure : 0; });
+    write(SYS_flock, [&](const seccomp_data&) { return ++calls <= kMaxCalls ? failure : 0; });
     EXPECT_FALSE(error) << error.message();
     EXPECT_EQ(calls, 2);  // the leftover's and the file's
     EXPECT_THAT(namesIn(directory.path()), ElementsAre(".new-1", "a.json"));
@@ -483,9 +483,9 @@ TEST_F(LinuxFileSystemCallTest, MakesAnotherFileForOneThatWasRemovedBeforeItWasL
 }
 
 TEST_F(LinuxFileSystemCallTest, GivesUpWhereSomebodyLocksEveryNewFile) {
-  write(SYS_flock, [&](const seccomp_data&) { return ++calls <= kMostCalls ? EWOULDBLOCK : 0; });
+  write(SYS_flock, [&](const seccomp_data&) { return ++calls <= kMaxCalls ? EWOULDBLOCK : 0; });
   EXPECT_EQ(error, std::errc::resource_unavailable_try_again);
-  EXPECT_LT(calls, kMostCalls);
+  EXPECT_LT(calls, kMaxCalls);
   EXPECT_THAT(namesIn(directory.path()), IsEmpty());
 }
 

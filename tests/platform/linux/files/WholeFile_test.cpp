@@ -14,11 +14,11 @@
 namespace tonewerk {
 namespace {
 
-constexpr std::size_t kMost = 1000;
+constexpr std::size_t kMax = 1000;
 
 class WholeFileTest : public testing::Test {
  protected:
-  std::error_code read(std::size_t most = kMost) { return readWholeFile(path_, most, text_, stamp_); }
+  std::error_code read(std::size_t most = kMax) { return readWholeFile(path_, most, text_, stamp_); }
   void write(const std::string& text) { std::ofstream(path_) << text; }
 
   TemporaryDirectory directory_;
@@ -28,13 +28,13 @@ class WholeFileTest : public testing::Test {
 };
 
 TEST_F(WholeFileTest, ReadsAFileUpToTheBoundAndNotPastIt) {
-  for (const std::size_t size : {std::size_t{0}, std::size_t{1}, kMost}) {
+  for (const std::size_t size : {std::size_t{0}, std::size_t{1}, kMax}) {
     write(std::string(size, 'a'));
     EXPECT_FALSE(read());
     EXPECT_EQ(text_, std::string(size, 'a'));
     EXPECT_EQ(static_cast<std::size_t>(stamp_.size), size);
   }
-  write(std::string(kMost + 1, 'a'));
+  write(std::string(kMax + 1, 'a'));
   EXPECT_EQ(read(), std::errc::file_too_large);
 }
 
@@ -52,8 +52,7 @@ TEST_F(WholeFileTest, WaitsForNothingThatIsNoRegularFile) {
 
 // The kernel's own files are never as large as they say: to a reader they grow under its hands.
 TEST_F(WholeFileTest, GivesUpOnAFileThatChangesWheneverItIsRead) {
-  EXPECT_EQ(readWholeFile("/proc/self/stat", kMost, text_, stamp_),
-            std::errc::resource_unavailable_try_again);
+  EXPECT_EQ(readWholeFile("/proc/self/stat", kMax, text_, stamp_), std::errc::resource_unavailable_try_again);
 }
 
 TEST_F(WholeFileTest, GivesTheOldOrTheNewOfAFileThatIsReplaced) {

@@ -183,29 +183,29 @@ TEST_F(RpcFrameReaderTest, GoesOnAfterALongFrame) {
 }
 
 TEST_F(RpcFrameReaderTest, TakesTheLongestFrameByteByByte) {
-  const std::string frame = requestOfSize(kMostFrameBytes);
+  const std::string frame = requestOfSize(kMaxFrameBytes);
   for (const char& byte : frame) {
     std::string_view one(&byte, 1);
     const Result expected = &byte == &frame.back() ? Result::kFrame : Result::kNeedsMore;
     ASSERT_EQ(reader.next(one), expected);
   }
-  EXPECT_EQ(reader.frame().wireBytes, kMostFrameBytes);
+  EXPECT_EQ(reader.frame().wireBytes, kMaxFrameBytes);
 }
 
 TEST_F(RpcFrameReaderTest, TakesAFrameOfOneMebibyteAndNoneLonger) {
-  EXPECT_EQ(resultOf(requestOfSize(kMostFrameBytes)), Result::kFrame);
-  EXPECT_EQ(resultOf(requestOfSize(kMostFrameBytes + 1)), Result::kBroken);
+  EXPECT_EQ(resultOf(requestOfSize(kMaxFrameBytes)), Result::kFrame);
+  EXPECT_EQ(resultOf(requestOfSize(kMaxFrameBytes + 1)), Result::kBroken);
   EXPECT_EQ(reader.problem(), "a frame that is too long");
 }
 
 TEST_F(RpcFrameReaderTest, GivesUpOnAFrameAsSoonAsItIsTooLong) {
-  const std::string endless = requestWith("91 DB FFFFFFFF") + std::string(kMostFrameBytes, 'x');
+  const std::string endless = requestWith("91 DB FFFFFFFF") + std::string(kMaxFrameBytes, 'x');
   EXPECT_EQ(resultOf(endless), Result::kBroken);
 }
 
 TEST_F(RpcFrameReaderTest, TakesThirtyTwoContainersInsideEachOtherAndNoMore) {
-  EXPECT_EQ(resultOf(requestOfDepth(kMostFrameDepth)), Result::kFrame);
-  EXPECT_EQ(resultOf(requestOfDepth(kMostFrameDepth + 1)), Result::kBroken);
+  EXPECT_EQ(resultOf(requestOfDepth(kMaxFrameDepth)), Result::kFrame);
+  EXPECT_EQ(resultOf(requestOfDepth(kMaxFrameDepth + 1)), Result::kBroken);
   EXPECT_EQ(reader.problem(), "a frame nested too deep");
 }
 

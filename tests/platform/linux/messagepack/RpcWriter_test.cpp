@@ -80,9 +80,9 @@ Value nested(std::size_t depth) {
 
 TEST(RpcWriterTest, KnowsHowDeepAFrameMayBe) {
   // The frame's own array and that of the arguments are the first two.
-  EXPECT_TRUE(fitsFrameDepth({Value(1), nested(kMostFrameDepth - 2)}));
-  EXPECT_FALSE(fitsFrameDepth({Value(1), nested(kMostFrameDepth - 1)}));
-  for (const std::size_t depth : {kMostFrameDepth - 2, kMostFrameDepth - 1}) {
+  EXPECT_TRUE(fitsFrameDepth({Value(1), nested(kMaxFrameDepth - 2)}));
+  EXPECT_FALSE(fitsFrameDepth({Value(1), nested(kMaxFrameDepth - 1)}));
+  for (const std::size_t depth : {kMaxFrameDepth - 2, kMaxFrameDepth - 1}) {
     std::string out;
     RpcWriter(out).request(1, "m", {nested(depth)});
     RpcStrings texts;

@@ -29,14 +29,14 @@ class RequestWindowTest : public testing::Test {
 };
 
 TEST_F(RequestWindowTest, HasRoomUntilTheBoundOfRequestsIsReached) {
-  auto tokens = start(kMostUnfinishedRequests - 1, 1);
+  auto tokens = start(kMaxUnfinishedRequests - 1, 1);
   EXPECT_TRUE(load->hasRoom(0));
   tokens.push_back(load->start(1));
   EXPECT_FALSE(load->hasRoom(0));
 }
 
 TEST_F(RequestWindowTest, HasRoomUntilTheBoundOfBytesIsReached) {
-  auto tokens = start(1, kMostUnfinishedBytes - 1);
+  auto tokens = start(1, kMaxUnfinishedBytes - 1);
   EXPECT_TRUE(load->hasRoom(0));
   tokens.push_back(load->start(1));
   EXPECT_FALSE(load->hasRoom(0));
@@ -44,26 +44,26 @@ TEST_F(RequestWindowTest, HasRoomUntilTheBoundOfBytesIsReached) {
 
 TEST_F(RequestWindowTest, CountsTheBytesOfUnreadRepliesToo) {
   const auto tokens = start(1, 1000);
-  EXPECT_TRUE(load->hasRoom(kMostUnfinishedBytes - 1001));
-  EXPECT_FALSE(load->hasRoom(kMostUnfinishedBytes - 1000));
+  EXPECT_TRUE(load->hasRoom(kMaxUnfinishedBytes - 1001));
+  EXPECT_FALSE(load->hasRoom(kMaxUnfinishedBytes - 1000));
 }
 
 TEST_F(RequestWindowTest, HasNoRoomForRepliesAloneEither) {
-  EXPECT_TRUE(load->hasRoom(kMostUnfinishedBytes - 1));
-  EXPECT_FALSE(load->hasRoom(kMostUnfinishedBytes));
+  EXPECT_TRUE(load->hasRoom(kMaxUnfinishedBytes - 1));
+  EXPECT_FALSE(load->hasRoom(kMaxUnfinishedBytes));
 }
 
 TEST_F(RequestWindowTest, SeesWhatHasFinishedWithoutBeingWoken) {
-  auto tokens = start(kMostUnfinishedRequests, 1);
+  auto tokens = start(kMaxUnfinishedRequests, 1);
   tokens.clear();
   EXPECT_TRUE(load->hasRoom(0));
   EXPECT_THAT(waker->take(), IsEmpty());
 }
 
 TEST_F(RequestWindowTest, WakesTheConnectionOnceWhenHalfHasFinished) {
-  auto tokens = start(kMostUnfinishedRequests, 1);
+  auto tokens = start(kMaxUnfinishedRequests, 1);
   ASSERT_FALSE(load->hasRoom(0));
-  tokens.resize(kMostUnfinishedRequests / 2 + 1);
+  tokens.resize(kMaxUnfinishedRequests / 2 + 1);
   EXPECT_THAT(waker->take(), IsEmpty());
   tokens.pop_back();
   EXPECT_THAT(waker->take(), ElementsAre(kConnection));
@@ -73,7 +73,7 @@ TEST_F(RequestWindowTest, WakesTheConnectionOnceWhenHalfHasFinished) {
 }
 
 TEST_F(RequestWindowTest, WakesTheConnectionForASingleLargeRequest) {
-  auto tokens = start(1, kMostUnfinishedBytes);
+  auto tokens = start(1, kMaxUnfinishedBytes);
   ASSERT_FALSE(load->hasRoom(0));
   tokens.clear();
   EXPECT_THAT(waker->take(), ElementsAre(kConnection));
@@ -84,7 +84,7 @@ TEST_F(RequestWindowTest, WakesTheConnectionForASingleLargeRequest) {
 // connection would never be read from again.
 TEST_F(RequestWindowTest, NeverMissesTheLastFinishOnAnotherThread) {
   for (int round = 0; round < 300; ++round) {
-    auto tokens = start(kMostUnfinishedRequests, 1);
+    auto tokens = start(kMaxUnfinishedRequests, 1);
     std::thread finisher([tokens = std::move(tokens)]() mutable { tokens.clear(); });
     const bool hadRoom = load->hasRoom(0);
     finisher.join();

@@ -28,7 +28,7 @@ namespace {
 
 constexpr int kRounds = 400;
 constexpr std::chrono::seconds kPatience{60};
-constexpr std::size_t kMostSessions = 8;
+constexpr std::size_t kMaxSessions = 8;
 
 constexpr char kRinger[] = "com.orvane.homedeck.ringerstate";
 constexpr char kReporting[] = "com.orvane.tonewerk.reporting";
@@ -79,7 +79,7 @@ class Sessions {
   using Session = std::shared_ptr<TWReportingSession>;
 
   void add() {
-    if (sessions_.size() >= kMostSessions) return;
+    if (sessions_.size() >= kMaxSessions) return;
     sessions_.push_back(TWReportingSession::initWithID(++lastIdentifier_, {4711}));
     const Session session = sessions_.back();
     session->start();

@@ -73,7 +73,7 @@ TEST_F(CurlHttpClientTest, NeverFollowsARedirection) {
 TEST_F(CurlHttpClientTest, ReadsNoMoreOfABodyThanItsBound) {
   const HttpAnswer answer = postAndGet({.fault = Fault::kHugeBody});
   EXPECT_EQ(answer.status, 200);
-  EXPECT_EQ(answer.body.size(), HttpAnswer::kMostBodyBytes);
+  EXPECT_EQ(answer.body.size(), HttpAnswer::kMaxBodyBytes);
   EXPECT_THAT(answer.problem, Not(IsEmpty()));
 }
 

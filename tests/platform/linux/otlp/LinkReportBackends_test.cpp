@@ -70,7 +70,7 @@ TEST(LinkReportBackendsTest, TakesEachAddressOnceAndEightAtMost) {
   ValueArray entries{"http://h0", "http://h0/"};
   for (int n = 1; n < 10; ++n) entries.append("http://h" + std::to_string(n));
   const LinkReportBackends backends = LinkReportBackends::from(Value(entries));
-  EXPECT_THAT(backends.endpoints, SizeIs(LinkReportBackends::kMostEndpoints));
+  EXPECT_THAT(backends.endpoints, SizeIs(LinkReportBackends::kMaxEndpoints));
   EXPECT_THAT(backends.problems, ElementsAre(HasSubstr("twice"), HasSubstr("\"http://h8\" is one address"),
                                              HasSubstr("\"http://h9\" is one address")));
 }

@@ -185,7 +185,7 @@ TEST_F(LinuxLinkReportTest, SaysOnceWhatItCannotReadAndTakesAChangeAtTheNextSess
 
 TEST_F(LinuxLinkReportTest, RefusesAPayloadThatIsTooLarge) {
   const auto session = start();
-  EXPECT_FALSE(send(*session, {{"a", std::string(LinuxLinkReport::kMostPayloadBytes, 'x')}}));
+  EXPECT_FALSE(send(*session, {{"a", std::string(LinuxLinkReport::kMaxPayloadBytes, 'x')}}));
   EXPECT_THAT(problem_, HasSubstr("too large"));
   EXPECT_EQ(count("rtc_message"), 0);
 }

@@ -132,14 +132,14 @@ TYPED_TEST(PreferenceStoreContract, DomainsThatAreNoPlainNamesAreRefused) {
 }
 
 TYPED_TEST(PreferenceStoreContract, AnIntegerBeyondSixtyThreeBitsIsRefused) {
-  constexpr std::uint64_t kMost = std::numeric_limits<std::int64_t>::max();
-  EXPECT_FALSE(this->store().write(kDomain, "a", kMost));
+  constexpr std::uint64_t kMax = std::numeric_limits<std::int64_t>::max();
+  EXPECT_FALSE(this->store().write(kDomain, "a", kMax));
   std::string problem;
-  EXPECT_EQ(this->store().write(kDomain, "a", kMost + 1, &problem), std::errc::result_out_of_range);
+  EXPECT_EQ(this->store().write(kDomain, "a", kMax + 1, &problem), std::errc::result_out_of_range);
   EXPECT_NE(problem, "");
-  EXPECT_EQ(this->store().write(kDomain, "a", ValueArray{ValueMap{{"deep", kMost + 1}}}),
+  EXPECT_EQ(this->store().write(kDomain, "a", ValueArray{ValueMap{{"deep", kMax + 1}}}),
             std::errc::result_out_of_range);
-  EXPECT_EQ(this->store().read(kDomain, "a"), Value(kMost));
+  EXPECT_EQ(this->store().read(kDomain, "a"), Value(kMax));
 }
 
 }  // namespace

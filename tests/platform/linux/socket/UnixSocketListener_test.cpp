@@ -314,7 +314,7 @@ TEST_F(UnixSocketListenerTest, EndsAConnectionThatSendsAResponse) {
 TEST_F(UnixSocketListenerTest, EndsAConnectionWhoseFrameIsTooLong) {
   RawClient client(path);
   // The other side stops reading before all of it is sent, so the send may fail.
-  client.send(requestOf(1, "takeMap", {Value(ValueMap{{"text", std::string(kMostFrameBytes, 'x')}})}));
+  client.send(requestOf(1, "takeMap", {Value(ValueMap{{"text", std::string(kMaxFrameBytes, 'x')}})}));
   EXPECT_TRUE(client.waitForEnd());
   EXPECT_THAT(errorLines(), ElementsAre(HasSubstr("a frame that is too long")));
   EXPECT_THAT(record.requests(), IsEmpty());
@@ -388,23 +388,23 @@ TEST_F(UnixSocketListenerTest, AnswersAsOftenAsTheObjectDoes) {
 
 TEST_F(UnixSocketListenerTest, ReadsNoFurtherThanTheBoundOfUnfinishedRequests) {
   RawClient client(path);
-  constexpr std::size_t kSent = 2 * kMostUnfinishedRequests + 100;
+  constexpr std::size_t kSent = 2 * kMaxUnfinishedRequests + 100;
   std::string frames;
   for (std::size_t at = 0; at < kSent; ++at) frames += notificationOf("hold", {Value(at)});
   ASSERT_TRUE(client.send(frames));
-  ASSERT_TRUE(record.waitForHeld(kMostUnfinishedRequests));
+  ASSERT_TRUE(record.waitForHeld(kMaxUnfinishedRequests));
   // Another client's answered request shows that the thread has had its time.
   RawClient other(path);
   expectServed(other);
-  EXPECT_EQ(record.heldCount(), kMostUnfinishedRequests);
+  EXPECT_EQ(record.heldCount(), kMaxUnfinishedRequests);
 
   auto held = record.takeHeld();
-  held.resize(kMostUnfinishedRequests / 2);
-  ASSERT_TRUE(record.waitForHeld(kMostUnfinishedRequests / 2));
+  held.resize(kMaxUnfinishedRequests / 2);
+  ASSERT_TRUE(record.waitForHeld(kMaxUnfinishedRequests / 2));
   expectServed(other);
-  EXPECT_EQ(record.heldCount(), kMostUnfinishedRequests / 2);
+  EXPECT_EQ(record.heldCount(), kMaxUnfinishedRequests / 2);
   held.clear();
-  ASSERT_TRUE(record.waitForHeld(kMostUnfinishedRequests));
+  ASSERT_TRUE(record.waitForHeld(kMaxUnfinishedRequests));
   record.takeHeld().clear();
   EXPECT_TRUE(record.waitForHeld(100));
 }
@@ -444,7 +444,7 @@ TEST_F(UnixSocketListenerTest, CountsWhatAnAnswerMayComeToFromTheRequestOn) {
 
 TEST_F(UnixSocketListenerTest, DoesNotCountARequestWhoseReplyAloneIsHeldBack) {
   RawClient client(path);
-  constexpr std::size_t kSent = 3 * kMostUnfinishedRequests;
+  constexpr std::size_t kSent = 3 * kMaxUnfinishedRequests;
   std::string frames;
   for (std::size_t at = 0; at < kSent; ++at) frames += requestOf(1, "holdReply", {Value(at)});
   ASSERT_TRUE(client.send(frames));
@@ -461,7 +461,7 @@ TEST_F(UnixSocketListenerTest, StopsReadingAPeerThatNeverReadsItsReplies) {
     }
   });
   // Replies beyond its bound and what two sockets hold: it is paused, and not one request more is read.
-  constexpr std::size_t kUntilPaused = kMostUnfinishedBytes / 500'000 + 1;
+  constexpr std::size_t kUntilPaused = kMaxUnfinishedBytes / 500'000 + 1;
   ASSERT_TRUE(record.waitForRequests(kUntilPaused));
   RawClient other(path);
   expectServed(other);
@@ -475,13 +475,13 @@ TEST_F(UnixSocketListenerTest, StopsReadingAPeerThatNeverReadsItsReplies) {
 }
 
 TEST_F(UnixSocketListenerTest, EndsAPausedConnectionOnceWhatItSentHasRun) {
-  constexpr std::size_t kSent = kMostUnfinishedRequests + 10;
+  constexpr std::size_t kSent = kMaxUnfinishedRequests + 10;
   {
     RawClient client(path);
     std::string frames;
     for (std::size_t at = 0; at < kSent; ++at) frames += notificationOf("hold", {Value(at)});
     ASSERT_TRUE(client.send(frames));
-    ASSERT_TRUE(record.waitForHeld(kMostUnfinishedRequests));
+    ASSERT_TRUE(record.waitForHeld(kMaxUnfinishedRequests));
   }
   EXPECT_THAT(record.events(), ElementsAre("accepted"));
   record.takeHeld().clear();
@@ -585,13 +585,13 @@ TEST_F(FewDescriptorsTest, LeavesHalfOfTheDescriptorsToTheDaemonAndLetsClientsWa
   listener.setDelegate(delegate);
   listener.resume();
   ::setrlimit(RLIMIT_NOFILE, &before_);
-  constexpr std::size_t kMost = 30;
+  constexpr std::size_t kMax = 30;
   std::vector<std::unique_ptr<RawClient>> clients;
-  for (std::size_t at = 0; at < kMost + 5; ++at) clients.push_back(std::make_unique<RawClient>(path));
-  ASSERT_TRUE(record.waitForEvents(kMost));
+  for (std::size_t at = 0; at < kMax + 5; ++at) clients.push_back(std::make_unique<RawClient>(path));
+  ASSERT_TRUE(record.waitForEvents(kMax));
   ASSERT_TRUE(clients.front()->send(requestOf(1, "takeInt64", {Value(1)})));
   ASSERT_TRUE(clients.front()->response());
-  EXPECT_THAT(record.events(), SizeIs(kMost));
+  EXPECT_THAT(record.events(), SizeIs(kMax));
 
   // Each that leaves makes room for one that waits.
   for (std::size_t at = 0; at < 5; ++at) clients[at]->close();

@@ -92,7 +92,7 @@ TEST_F(LinuxSystemInformationTest, ReadsSensorsAtMostOnceASecond) {
   EXPECT_EQ(thermalLevel(), 0);
   makeZone(0, 99'000, {{"hot", 90'000}});
   EXPECT_EQ(system_.thermalLevel(), 0);
-  clock_.advance(LinuxSystemInformation::kMostAge);
+  clock_.advance(LinuxSystemInformation::kMaxAge);
   EXPECT_EQ(system_.thermalLevel(), 0);
   clock_.advance(0.1);
   EXPECT_EQ(system_.thermalLevel(), 2);

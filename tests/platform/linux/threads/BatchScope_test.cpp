@@ -38,7 +38,7 @@ TEST(BatchScopeTest, EndsAfterSoManyPieces) {
   const auto counter = std::make_shared<Counter>();
   BatchScope batch;
   BatchScope::defer(counter);
-  for (std::size_t piece = 1; piece < BatchScope::kMostPieces; ++piece) batch.pieceHasRun();
+  for (std::size_t piece = 1; piece < BatchScope::kMaxPieces; ++piece) batch.pieceHasRun();
   EXPECT_EQ(counter->ends, 0);
   batch.pieceHasRun();
   EXPECT_EQ(counter->ends, 1);

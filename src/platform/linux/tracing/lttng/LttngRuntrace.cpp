@@ -192,7 +192,7 @@ class LttngRuntrace::Session final : public RuntraceSession {
     course_->setDelegate(std::move(delegate));
   }
   void startRuntrace() override {
-    if (queue_->busyFor() < kMostBusy) {
+    if (queue_->busyFor() < kMaxBusy) {
       post([](Control& control, Course& course) { control.start(course); });
       return;
     }

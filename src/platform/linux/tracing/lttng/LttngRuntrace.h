@@ -18,7 +18,7 @@ namespace tonewerk {
 class LttngRuntrace final : public Runtrace {
  public:
   // A control thread that is busy for longer than this is taken for one that hangs.
-  static constexpr std::chrono::seconds kMostBusy{20};
+  static constexpr std::chrono::seconds kMaxBusy{20};
 
   explicit LttngRuntrace(const TracingParts& parts);
   LttngRuntrace(const LttngRuntrace&) = delete;

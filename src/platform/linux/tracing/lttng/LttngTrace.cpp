@@ -27,7 +27,7 @@ constexpr char kBeginEvent[] = "tonewerk:signpost_begin";
 constexpr std::uint64_t kSubBufferBytes = std::uint64_t{1} << 20;
 constexpr std::uint64_t kSubBuffers = 4;
 // Its compiled form has to stay below 64 KiB.
-constexpr std::size_t kMostFilterBytes = 8192;
+constexpr std::size_t kMaxFilterBytes = 8192;
 constexpr seconds kDataTimeout{60};
 // After a session daemon has died, programs take a while to look for another.
 constexpr seconds kSeenTimeout{8};
@@ -90,7 +90,7 @@ std::vector<std::string> filtersFor(const std::set<std::string>& signposts) {
       condition += c;
     }
     condition += '"';
-    if (filters.empty() || filters.back().size() + condition.size() > kMostFilterBytes) {
+    if (filters.empty() || filters.back().size() + condition.size() > kMaxFilterBytes) {
       filters.push_back(condition);
     } else {
       filters.back() += " || " + condition;

@@ -12,15 +12,15 @@ namespace tonewerk {
 namespace {
 
 bool isTraceable(const std::string& name) {
-  return !name.empty() && name.size() <= WantedSignposts::kMostNameBytes &&
+  return !name.empty() && name.size() <= WantedSignposts::kMaxNameBytes &&
          std::none_of(name.begin(), name.end(),
                       [](char c) { return static_cast<unsigned char>(c) < ' ' || c == '"'; });
 }
 
 std::string problemOf(const std::set<std::string>& names) {
   if (names.empty()) return "names no signpost";
-  if (names.size() > WantedSignposts::kMost) {
-    return "names more than " + std::to_string(WantedSignposts::kMost) + " signposts";
+  if (names.size() > WantedSignposts::kMax) {
+    return "names more than " + std::to_string(WantedSignposts::kMax) + " signposts";
   }
   const bool areTraceable = std::all_of(names.begin(), names.end(), isTraceable);
   return areTraceable ? "" : "holds a name that no signpost can have";

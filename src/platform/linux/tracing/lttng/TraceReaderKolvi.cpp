@@ -45,7 +45,7 @@ TraceReaderKolvi::TraceReaderKolvi(std::string readerPath, std::chrono::millisec
 std::unique_ptr<KolviModel> TraceReaderKolvi::openModel(const std::string& traceLocation,
                                                         std::string& problem) {
   const BoundedCommand::Result result =
-      BoundedCommand({readerPath_, traceLocation}, {.time = timeout_, .bytes = kMostBytes}).run();
+      BoundedCommand({readerPath_, traceLocation}, {.time = timeout_, .bytes = kMaxBytes}).run();
   // A reader that ended badly may have said why before.
   auto intervals = parseTraceIntervals(result.output, problem);
   if (!intervals && result.end != BoundedCommand::End::kExited)

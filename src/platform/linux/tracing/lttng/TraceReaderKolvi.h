@@ -16,7 +16,7 @@ namespace tonewerk {
 class TraceReaderKolvi final : public Kolvi {
  public:
   static constexpr std::chrono::seconds kTimeout{60};
-  static constexpr std::size_t kMostBytes = std::size_t{512} << 20;  // some 30 million intervals
+  static constexpr std::size_t kMaxBytes = std::size_t{512} << 20;  // some 30 million intervals
 
   explicit TraceReaderKolvi(std::string readerPath, std::chrono::milliseconds timeout = kTimeout);
 

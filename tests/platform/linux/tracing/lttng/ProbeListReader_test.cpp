@@ -50,19 +50,19 @@ TEST_F(ProbeListReaderTest, SaysWhatIsWrongWithTheFile) {
 }
 
 TEST_F(ProbeListReaderTest, TakesABoundedNumberOfSignposts) {
-  EXPECT_EQ(read(intervals(WantedSignposts::kMost)).problem, "");
-  EXPECT_EQ(read(intervals(WantedSignposts::kMost + 1)).problem,
+  EXPECT_EQ(read(intervals(WantedSignposts::kMax)).problem, "");
+  EXPECT_EQ(read(intervals(WantedSignposts::kMax + 1)).problem,
             "the probe list /probes.json names more than 200 signposts");
 }
 
 TEST_F(ProbeListReaderTest, TakesNamesThatSignpostsCanHave) {
-  const std::string longest(WantedSignposts::kMostNameBytes, 'x');
+  const std::string longest(WantedSignposts::kMaxNameBytes, 'x');
   EXPECT_THAT(read(interval(longest)).names, SizeIs(1));
   EXPECT_THAT(read(interval("grün *? \\\\ '")).names, ElementsAre("grün *? \\ '"));
 }
 
 TEST_F(ProbeListReaderTest, RefusesNamesThatNoSignpostCanHave) {
-  for (const std::string& name : {std::string(), std::string(WantedSignposts::kMostNameBytes + 1, 'x'),
+  for (const std::string& name : {std::string(), std::string(WantedSignposts::kMaxNameBytes + 1, 'x'),
                                   std::string("a\\nb"), std::string("a\\u0000b"), std::string("a\\\"b")}) {
     EXPECT_EQ(read(interval(name)).problem,
               "the probe list /probes.json holds a name that no signpost can have")
