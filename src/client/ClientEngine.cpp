@@ -37,7 +37,7 @@ ClientEngine::ClientEngine(ClientSettings settings)
 
 // ---- callers ----
 
-bool ClientEngine::goOn() {
+bool ClientEngine::ensureRunning() {
   if (isEnding_) return true;
   if (thread_.isRunning()) {
     // While there is no daemon the thread has nothing to do; while the daemon reads nothing, neither.
@@ -80,7 +80,7 @@ twr_status ClientEngine::flush(milliseconds timeout) {
 twr_status ClientEngine::await(Lock& lock, const std::shared_ptr<Waiter>& waiter, milliseconds timeout) {
   // Somebody waits: not for the back-off.
   nextAttempt_ = Clock::now();
-  if (!goOn()) return TWR_NO_MEMORY;
+  if (!ensureRunning()) return TWR_NO_MEMORY;
   wake();
   const auto until = Clock::now() + std::max(timeout, milliseconds::zero());
   waiter->condition.wait_until(lock, until, [&] { return waiter->isDone; });
@@ -99,7 +99,7 @@ void ClientEngine::end(milliseconds timeout) {
 bool ClientEngine::endByItself(milliseconds timeout) {
   const Lock lock(mutex_);
   if (!thread_.isThisThread()) return false;
-  isOrphan_ = true;
+  isDetached_ = true;
   beginToEnd(timeout);
   return true;
 }
@@ -153,9 +153,9 @@ bool ClientEngine::hasThread() const {
   return thread_.isRunning() && !thread_.isThisThread();
 }
 
-bool ClientEngine::isDeadOrphan() const {
+bool ClientEngine::isReapable() const {
   const Lock lock(mutex_);
-  return isOrphan_ && hasFinished_;
+  return isDetached_ && hasFinished_;
 }
 
 void ClientEngine::abandon() {
@@ -344,7 +344,7 @@ bool ClientEngine::deliver(Lock& lock) {
   const Deliveries deliveries = std::exchange(deliveries_, {});
   lock.unlock();
   for (const Delivery& delivery : deliveries) {
-    if (delivery.state && isOrphan_) continue;  // set on this thread, by what is called here
+    if (delivery.state && isDetached_) continue;  // set on this thread, by what is called here
     if (delivery.state) {
       settings_.stateChanged(settings_.context, *delivery.state);
     } else {

@@ -48,14 +48,14 @@ class ClientEngine {
     if (hasForked_.load(std::memory_order_relaxed)) return TWR_FORKED;
     const std::unique_lock lock(mutex_);
     if (state_ == TWR_STATE_ENDED) return TWR_NOT_CONNECTED;
-    return goOn() ? ask(outbox_) : TWR_NO_MEMORY;
+    return ensureRunning() ? ask(outbox_) : TWR_NO_MEMORY;
   }
   // The same for what must be done whether the client has ended or not, or has forked away.
   template <class Do>
   auto withOutbox(Do function) {
     const std::unique_lock lock(mutex_);
     auto result = function(outbox_);
-    if (state_ != TWR_STATE_ENDED) goOn();
+    if (state_ != TWR_STATE_ENDED) ensureRunning();
     return result;
   }
 
@@ -83,7 +83,7 @@ class ClientEngine {
   // One that may be joined from here.
   bool hasThread() const;
   // Ended by itself, and nothing is left to be done but to join its thread.
-  bool isDeadOrphan() const;
+  bool isReapable() const;
   // Ends the thread at once; nobody is told.
   void abandon();
 
@@ -92,7 +92,7 @@ class ClientEngine {
   using Clock = std::chrono::steady_clock;
 
   // Under the mutex, callers'. False when there can be no thread.
-  bool goOn();
+  bool ensureRunning();
   void wake();
   twr_status await(Lock& lock, const std::shared_ptr<Waiter>& waiter, std::chrono::milliseconds timeout);
   void beginToEnd(std::chrono::milliseconds timeout);
@@ -148,7 +148,7 @@ class ClientEngine {
 
   bool isEnding_ = false;
   bool isAbandoned_ = false;
-  bool isOrphan_ = false;
+  bool isDetached_ = false;
   bool hasFinished_ = false;
   bool isBeingJoined_ = false;
   std::condition_variable joined_;

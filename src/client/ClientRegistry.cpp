@@ -80,8 +80,8 @@ std::shared_ptr<void> remove(ClientEngine& engine) {
   return std::move(engine.owner);
 }
 
-void buryOrphans() {
-  const auto isDead = [](const ClientEngine& engine) { return engine.isDeadOrphan(); };
+void reapDetached() {
+  const auto isDead = [](const ClientEngine& engine) { return engine.isReapable(); };
   for (HeldClient client = firstOf(isDead); client.engine != nullptr; client = firstOf(isDead)) {
     client.engine->end(std::chrono::milliseconds::zero());
     remove(*client.engine);

@@ -16,7 +16,7 @@ bool add(ClientEngine& engine);
 std::shared_ptr<void> remove(ClientEngine& engine);
 // Removes and destroys the clients that were destroyed inside their own callbacks and have come to their end.
 // Not inside a callback.
-void buryOrphans();
+void reapDetached();
 
 }  // namespace clientRegistry
 }  // namespace tonewerk

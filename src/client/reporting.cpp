@@ -114,7 +114,7 @@ twr_status change(twr_session* session, SessionChange change, PendingReply reply
 }  // namespace
 
 twr_client* makeClient(ClientSettings settings) {
-  if (!ClientThread::isCurrent()) clientRegistry::buryOrphans();
+  if (!ClientThread::isCurrent()) clientRegistry::reapDetached();
   const auto client = std::make_shared<twr_client>(std::move(settings));
   client->engine.owner = client;
   if (clientRegistry::add(client->engine)) return client.get();
@@ -170,7 +170,7 @@ void twr_client_destroy(twr_client* client, int timeoutMs) {
     engine.end(milliseconds(timeoutMs));
   }
   clientRegistry::remove(engine).reset();
-  if (!ClientThread::isCurrent()) clientRegistry::buryOrphans();
+  if (!ClientThread::isCurrent()) clientRegistry::reapDetached();
 }
 
 twr_status twr_client_connect(twr_client* client, int timeoutMs) {

@@ -105,7 +105,7 @@ TEST_F(ClientEngineTest, SaysThatThereIsNoDaemon) {
   // Each question is an attempt of its own.
   session = twr_session_create(client, 77);
   EXPECT_EQ(twr_client_flush(client, kScriptPatienceMs), TWR_NOT_CONNECTED);
-  daemon = std::make_unique<ScriptedDaemon>(path);
+  daemon = std::make_unique<ScriptedServer>(path);
   EXPECT_EQ(twr_client_flush(client, kScriptPatienceMs), TWR_OK);
   EXPECT_EQ(daemon->accept()->nextText(), "createReportingSession 77");
 }
@@ -121,7 +121,7 @@ TEST_F(ClientEngineTest, KeepsWhatIsQueuedUntilThereIsADaemon) {
   EXPECT_LE(info().queued_bytes, 2000U);
   EXPECT_EQ(info().messages_sent, 0U);
 
-  daemon = std::make_unique<ScriptedDaemon>(path);
+  daemon = std::make_unique<ScriptedServer>(path);
   const auto connection = daemon->accept();
   EXPECT_EQ(connection->nextText(), "createReportingSession 77");
   for (int at = 0; at < kept; ++at) EXPECT_EQ(connection->nextText(), message(at));
@@ -265,7 +265,7 @@ TEST_F(ClientEngineTest, TriesOnceWhereItIsToldTo) {
   twr_sender_close(sender);
   EXPECT_NE(twr_session_create(client, 78), nullptr);
   EXPECT_EQ(twr_session_destroy(session, nullptr, nullptr), TWR_NOT_CONNECTED);
-  daemon = std::make_unique<ScriptedDaemon>(path);
+  daemon = std::make_unique<ScriptedServer>(path);
   EXPECT_EQ(twr_client_connect(client, kScriptPatienceMs), TWR_NOT_CONNECTED);
   EXPECT_FALSE(daemon->hasCaller());
 }
@@ -488,7 +488,7 @@ TEST_F(ClientEngineTest, TheMessageAfterAFullRingSaysHowManyItDropped) {
   ASSERT_GT(taken, 0);
   EXPECT_EQ(push(), TWR_FULL);
 
-  daemon = std::make_unique<ScriptedDaemon>(path);
+  daemon = std::make_unique<ScriptedServer>(path);
   const auto connection = daemon->accept();
   EXPECT_EQ(connection->nextText(), "createReportingSession 77");
   for (int at = 0; at < taken; ++at) EXPECT_EQ(connection->nextText(), message(5));
@@ -507,7 +507,7 @@ TEST_F(ClientEngineTest, ASessionsEndSaysWhatNoMessageHasSaid) {
   const int taken = fillQueue();
   twr_session_destroy(session, nullptr, nullptr);
 
-  daemon = std::make_unique<ScriptedDaemon>(path);
+  daemon = std::make_unique<ScriptedServer>(path);
   const auto connection = daemon->accept();
   EXPECT_EQ(connection->nextText(), "createReportingSession 77");
   for (int at = 0; at < taken; ++at) EXPECT_EQ(connection->nextText(), message(at));

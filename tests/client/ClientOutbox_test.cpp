@@ -9,7 +9,7 @@
 
 #include "client/ClientEngine.h"
 #include "client/RequestBody.h"
-#include "client/ScriptedDaemon.h"
+#include "client/ScriptedServer.h"
 #include "client/TestPayload.h"
 #include "platform/linux/messagepack/RpcFrameReader.h"
 

@@ -223,7 +223,7 @@ bool threadsBecome(std::size_t count) {
 
 TEST(UnloadedLibraryTest, LeavesNoThreadNoDescriptorAndNoHandler) {
   TemporaryDirectory directory;
-  ScriptedDaemon daemon(directory.path("reporting.sock"));
+  ScriptedServer daemon(directory.path("reporting.sock"));
   const std::string path = directory.path("reporting.sock");
   { const LoadedLibrary once; }  // what the loader itself keeps for ever
   const std::size_t threads = threadsBefore();

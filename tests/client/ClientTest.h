@@ -14,7 +14,7 @@
 #include <vector>
 
 #include "client/ClientHandle.h"
-#include "client/ScriptedDaemon.h"
+#include "client/ScriptedServer.h"
 #include "client/TestPayload.h"
 #include "support/TemporaryDirectory.h"
 #include "tonewerk/reporting.h"
@@ -135,7 +135,7 @@ class ClientTest : public testing::Test {
 
   TemporaryDirectory directory;
   const std::string path = directory.path("reporting.sock");
-  std::unique_ptr<ScriptedDaemon> daemon = std::make_unique<ScriptedDaemon>(path);
+  std::unique_ptr<ScriptedServer> daemon = std::make_unique<ScriptedServer>(path);
   AnswerLog log;
   twr_client* client = makeClient(settings(path));
   twr_session* session = nullptr;

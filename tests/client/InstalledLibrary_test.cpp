@@ -6,7 +6,7 @@
 #include <string>
 
 #include "client/CommandOutput.h"
-#include "client/ScriptedDaemon.h"
+#include "client/ScriptedServer.h"
 #include "support/TemporaryDirectory.h"
 
 namespace tonewerk {
@@ -71,7 +71,7 @@ class InstalledLibraryTest : public testing::Test {
   }
   // The program reports to a daemon, and says the version.
   void expectReports(const std::string& program, const std::string& environment = "") {
-    ScriptedDaemon daemon(directory.path("reporting.sock"));
+    ScriptedServer daemon(directory.path("reporting.sock"));
     EXPECT_THAT(outputOfCommand(environment + " " + program + " " + directory.path("reporting.sock")),
                 testing::MatchesRegex("[0-9]+\\.[0-9]+\\.[0-9]+\n"));
     EXPECT_EQ(daemon.accept()->nextText(), "createReportingSession 77");

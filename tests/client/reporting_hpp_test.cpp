@@ -8,7 +8,7 @@
 
 #include "client/MessageFrame.h"
 #include "client/OneFrame.h"
-#include "client/ScriptedDaemon.h"
+#include "client/ScriptedServer.h"
 #include "support/TemporaryDirectory.h"
 #include "tonewerk/reporting.hpp"
 
@@ -58,7 +58,7 @@ class ReportingHppTest : public testing::Test {
 
   TemporaryDirectory directory;
   const std::string path = directory.path("reporting.sock");
-  ScriptedDaemon daemon{path};
+  ScriptedServer daemon{path};
 };
 
 ValueMap readBack(const reporting::AnyPayload& payload) {

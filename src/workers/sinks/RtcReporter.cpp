@@ -113,16 +113,16 @@ void RtcReporter::takeBackends(std::uint64_t run, const LinkReportSession::Backe
 void RtcReporter::takeTimeout(std::uint64_t run) {
   if (run != run_ || !queue_->isHeld()) return;
   errorLog(TWReportingSessionLinkReportCategory(), "timed out waiting for backends");
-  goOn();
+  resume();
 }
 
 void RtcReporter::endWait() {
   debugLog(TWReportingSessionLinkReportCategory(), "%s",
            linkReportSessionStarted_ ? "continuing with backends!" : "failed to find backend");
-  goOn();
+  resume();
 }
 
-void RtcReporter::goOn() {
+void RtcReporter::resume() {
   timeout_.reset();
   if (const std::uint64_t dropped = queue_->takeDroppedCount(); dropped > 0) {
     errorLog(TWReportingSessionLinkReportCategory(),

@@ -54,7 +54,7 @@ class RtcReporter : public std::enable_shared_from_this<RtcReporter> {
   void takeBackends(std::uint64_t run, const LinkReportSession::Backends& backends);
   void takeTimeout(std::uint64_t run);
   void endWait();
-  void goOn();
+  void resume();
   void sendMessage(TWReportingSessionMessage& message);
 
   const std::shared_ptr<Strand> queue_;

@@ -43,7 +43,7 @@ void ReplyOutbox::endOfBatch() {
   if (mustWake) waker_->wake(connection_);
 }
 
-ReplyOutbox::State ReplyOutbox::goOn() {
+ReplyOutbox::State ReplyOutbox::flush() {
   const std::lock_guard lock(mutex_);
   if (!isClosed_ && state_ == State::kFull) sendUnsent();
   return state_;

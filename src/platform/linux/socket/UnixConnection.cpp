@@ -75,14 +75,14 @@ void UnixConnection::resume() {
 
 void UnixConnection::handleEvents(std::uint32_t events) {
   if (hasEnded_) return;
-  if ((events & EPOLLOUT) != 0) replies_ = outbox_->goOn();
+  if ((events & EPOLLOUT) != 0) replies_ = outbox_->flush();
   if (!isPaused_) receive();
   handleWake();
 }
 
 void UnixConnection::handleWake() {
   if (hasEnded_) return;
-  replies_ = outbox_->goOn();
+  replies_ = outbox_->flush();
   if (isPaused_ && hasRoom()) process(std::exchange(rest_, {}));
   updateInterest();
 }

@@ -3,7 +3,7 @@
 #include <chrono>
 #include <system_error>
 
-#include "tools/twctl/Daemon.h"
+#include "tools/twctl/DaemonCalls.h"
 #include "tools/twctl/commands/Commands.h"
 
 namespace tonewerk {
@@ -13,12 +13,12 @@ constexpr std::chrono::seconds kEndTimeout{30};
 
 // There is no answer: the connection ends with the daemon.
 void kill(Tool& tool) {
-  Daemon daemon(tool);
-  if (!daemon.connect(Daemon::Role::kClient)) return;
+  DaemonCalls daemon(tool);
+  if (!daemon.connect(DaemonCalls::Role::kClient)) return;
   std::error_code error;
   const auto answer = daemon.client().call("killService", {}, kEndTimeout, error);
   if (answer && answer->error) {
-    tool.status = tool.fail(kRefused, Daemon::describe("killService", *answer->error));
+    tool.status = tool.fail(kRefused, DaemonCalls::describe("killService", *answer->error));
   } else if (error == std::errc::timed_out) {
     tool.status = tool.fail(kNoDaemon, "the daemon has not ended");
   }

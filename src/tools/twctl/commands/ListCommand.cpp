@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <CLI/CLI.hpp>
 
-#include "tools/twctl/Daemon.h"
+#include "tools/twctl/DaemonCalls.h"
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/commands/SessionLookup.h"
 #include "tools/twctl/show/SessionTable.h"
@@ -10,9 +10,9 @@ namespace tonewerk {
 namespace {
 
 void list(Tool& tool) {
-  Daemon daemon(tool);
+  DaemonCalls daemon(tool);
   std::optional<Value> reporters;
-  if (!daemon.connect(Daemon::Role::kOnlooker) || !daemon.call("getAllReporters", {}, reporters)) return;
+  if (!daemon.connect(DaemonCalls::Role::kOnlooker) || !daemon.call("getAllReporters", {}, reporters)) return;
   SessionTable table(tool);
   const ValueArray* identifiers = reporters ? reporters->asArray() : nullptr;
   if (identifiers == nullptr) return;

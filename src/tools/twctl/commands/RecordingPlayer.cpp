@@ -4,7 +4,7 @@
 #include <algorithm>
 #include <utility>
 
-#include "tools/twctl/Daemon.h"
+#include "tools/twctl/DaemonCalls.h"
 
 namespace tonewerk {
 namespace {
@@ -65,7 +65,7 @@ std::error_code RecordingPlayer::send(const RecordedCall& call) {
   endsDaemon_ = endsDaemon_ || isKill;
   const auto answered = [this, &call, isStart](const DaemonConnection::Answer& answer) {
     if (!isStart) --unanswered_;
-    if (answer.error) refuse(call, Daemon::describe(call.method, *answer.error));
+    if (answer.error) refuse(call, DaemonCalls::describe(call.method, *answer.error));
   };
   const std::error_code error = daemon_.request(call.method, call.parametersAt(secondsSince1970()), answered);
   if (error == std::errc::message_size || error == std::errc::invalid_argument) {

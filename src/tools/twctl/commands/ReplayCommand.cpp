@@ -9,7 +9,7 @@
 #include <system_error>
 
 #include "service/TWReportingServiceExport.h"
-#include "tools/twctl/Daemon.h"
+#include "tools/twctl/DaemonCalls.h"
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/commands/RecordingPlayer.h"
 #include "tools/twctl/input/Recording.h"
@@ -56,8 +56,8 @@ void replay(Tool& tool, const ReplayOptions& options) {
     return;
   }
   const std::optional<Recording> recording = readRecording(tool, options.file);
-  Daemon daemon(tool);
-  if (!recording || !daemon.connect(Daemon::Role::kClient)) return;
+  DaemonCalls daemon(tool);
+  if (!recording || !daemon.connect(DaemonCalls::Role::kClient)) return;
 
   RecordingPlayer player(daemon.client(), *speed, [&](const RecordedCall& call, const std::string& why) {
     tool.status = tool.fail(kRefused, options.file + ": line " + std::to_string(call.line) + ": " + why);

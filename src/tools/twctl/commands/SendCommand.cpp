@@ -6,7 +6,7 @@
 #include <vector>
 
 #include "platform/JsonService.h"
-#include "tools/twctl/Daemon.h"
+#include "tools/twctl/DaemonCalls.h"
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/commands/SessionLookup.h"
 #include "tools/twctl/input/ValueArguments.h"
@@ -46,7 +46,7 @@ std::optional<ValueMap> payloadOf(const Tool& tool, const SendOptions& options, 
 }
 
 // Whether all of them are sessions; says which are none. The daemon itself passes over those in silence.
-bool knowsAll(Tool& tool, Daemon& daemon, const std::vector<ReporterID>& reporterIDs) {
+bool knowsAll(Tool& tool, DaemonCalls& daemon, const std::vector<ReporterID>& reporterIDs) {
   std::string unknown;
   for (const ReporterID reporterID : reporterIDs) {
     std::optional<AudioServiceType> serviceType;
@@ -72,9 +72,9 @@ void send(Tool& tool, const SendOptions& options) {
   std::optional<ValueMap> payload = payloadOf(tool, options, problem);
   if (!payload) return refuseUsage(problem);
 
-  Daemon daemon(tool);
+  DaemonCalls daemon(tool);
   std::optional<Value> result;
-  if (!daemon.connect(Daemon::Role::kClient) || !knowsAll(tool, daemon, options.reporterIDs)) return;
+  if (!daemon.connect(DaemonCalls::Role::kClient) || !knowsAll(tool, daemon, options.reporterIDs)) return;
   Argument recipients;
   if (!options.reporterIDs.empty())
     recipients = ValueArray(std::vector<Value>(options.reporterIDs.begin(), options.reporterIDs.end()));

@@ -2,11 +2,11 @@
 #include "tools/twctl/commands/SessionLookup.h"
 
 #include "service/TWReportingServiceProtocol.h"
-#include "tools/twctl/Daemon.h"
+#include "tools/twctl/DaemonCalls.h"
 
 namespace tonewerk {
 
-bool lookUpSession(Daemon& daemon, ReporterID reporterID, std::optional<AudioServiceType>& serviceType) {
+bool lookUpSession(DaemonCalls& daemon, ReporterID reporterID, std::optional<AudioServiceType>& serviceType) {
   serviceType.reset();
   std::optional<Value> validity;
   if (!daemon.call("reporterIDValid", {Value(reporterID)}, validity)) return false;

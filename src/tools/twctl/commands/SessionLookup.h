@@ -7,11 +7,11 @@
 
 namespace tonewerk {
 
-class Daemon;
+class DaemonCalls;
 
 // Asks the daemon for the session of that identifier: its service type in `serviceType`, or none when nobody
 // has it. 0, by which the answer says "nobody", is always found. False when the daemon did not answer, which
 // has then been said.
-bool lookUpSession(Daemon& daemon, ReporterID reporterID, std::optional<AudioServiceType>& serviceType);
+bool lookUpSession(DaemonCalls& daemon, ReporterID reporterID, std::optional<AudioServiceType>& serviceType);
 
 }  // namespace tonewerk

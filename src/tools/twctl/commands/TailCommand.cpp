@@ -9,7 +9,7 @@
 #include <vector>
 
 #include "service/WatchKeys.h"
-#include "tools/twctl/Daemon.h"
+#include "tools/twctl/DaemonCalls.h"
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/commands/LiveEvents.h"
 #include "tools/twctl/input/ValueArguments.h"
@@ -72,8 +72,8 @@ void tail(Tool& tool, const TailOptions& options) {
     tool.status = tool.fail(kWrongUsage, problem);
     return;
   }
-  Daemon daemon(tool);
-  if (!daemon.connect(Daemon::Role::kOnlooker)) return;
+  DaemonCalls daemon(tool);
+  if (!daemon.connect(DaemonCalls::Role::kOnlooker)) return;
   LiveEvents events(-1, tool.outDescriptor);
   const auto waitReadable = [&events](int descriptor) {
     LiveEvents::Event event{};

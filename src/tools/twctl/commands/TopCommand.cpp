@@ -9,7 +9,7 @@
 #include <utility>
 
 #include "service/WatchKeys.h"
-#include "tools/twctl/Daemon.h"
+#include "tools/twctl/DaemonCalls.h"
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/commands/LiveEvents.h"
 #include "tools/twctl/commands/TopLoop.h"
@@ -98,7 +98,7 @@ void printFrame(const Tool& tool, const std::vector<SessionRow>& rows) {
 }
 
 // A rate needs two listings.
-void printOneFrame(const Tool& tool, Daemon& daemon, double interval) {
+void printOneFrame(const Tool& tool, DaemonCalls& daemon, double interval) {
   const auto ask = [&daemon](const Arguments& arguments) -> std::optional<Value> {
     std::optional<Value> result;
     return daemon.call("watch.sessions", arguments, result) ? result : std::nullopt;
@@ -112,7 +112,7 @@ void printOneFrame(const Tool& tool, Daemon& daemon, double interval) {
   if (second) printFrame(tool, rates.rowsOf(*second, steadyNow()));
 }
 
-void showOnTerminal(Tool& tool, Daemon& daemon, double interval) {
+void showOnTerminal(Tool& tool, DaemonCalls& daemon, double interval) {
   std::optional<DaemonFailure> failure;
   {
     TerminalScreen screen(tool);
@@ -127,8 +127,8 @@ void showOnTerminal(Tool& tool, Daemon& daemon, double interval) {
 }
 
 void top(Tool& tool, double interval) {
-  Daemon daemon(tool);
-  if (!daemon.connect(Daemon::Role::kOnlooker)) return;
+  DaemonCalls daemon(tool);
+  if (!daemon.connect(DaemonCalls::Role::kOnlooker)) return;
   if (tool.outIsTerminal && !tool.asJson) {
     showOnTerminal(tool, daemon, interval);
   } else {

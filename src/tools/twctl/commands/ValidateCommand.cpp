@@ -3,7 +3,7 @@
 #include <cstdint>
 #include <memory>
 
-#include "tools/twctl/Daemon.h"
+#include "tools/twctl/DaemonCalls.h"
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/commands/SessionLookup.h"
 #include "tools/twctl/input/ValueArguments.h"
@@ -13,9 +13,10 @@ namespace tonewerk {
 namespace {
 
 void validate(Tool& tool, ReporterID reporterID) {
-  Daemon daemon(tool);
+  DaemonCalls daemon(tool);
   std::optional<AudioServiceType> serviceType;
-  if (!daemon.connect(Daemon::Role::kOnlooker) || !lookUpSession(daemon, reporterID, serviceType)) return;
+  if (!daemon.connect(DaemonCalls::Role::kOnlooker) || !lookUpSession(daemon, reporterID, serviceType))
+    return;
   if (reporterID == 0 || !serviceType) {
     tool.status = tool.fail(kRefused, "no session has the identifier " + std::to_string(reporterID));
     return;

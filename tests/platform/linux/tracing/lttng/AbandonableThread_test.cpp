@@ -35,29 +35,29 @@ TEST(AbandonableThreadTest, SaysHowLongItHasBeenBusy) {
   const AbandonableThread thread(1h);
   EXPECT_EQ(thread.queue()->busyFor(), 0ms);
   std::promise<void> begun;
-  std::promise<void> goOn;
+  std::promise<void> proceed;
   thread.queue()->post([&] {
     begun.set_value();
-    goOn.get_future().wait();
+    proceed.get_future().wait();
   });
   begun.get_future().wait();
   while (thread.queue()->busyFor() == 0ms) std::this_thread::yield();
-  goOn.set_value();
+  proceed.set_value();
   while (thread.queue()->busyFor() != 0ms) std::this_thread::yield();
 }
 
 // What a frozen session daemon does to the daemon's end.
 TEST(AbandonableThreadTest, LeavesAPieceBehindThatDoesNotReturn) {
-  const auto goOn = std::make_shared<std::promise<void>>();
+  const auto proceed = std::make_shared<std::promise<void>>();
   const auto ended = std::make_shared<std::promise<void>>();
   {
     const AbandonableThread thread(1ms);
-    thread.queue()->post([goOn, ended] {
-      goOn->get_future().wait();
+    thread.queue()->post([proceed, ended] {
+      proceed->get_future().wait();
       ended->set_value();
     });
   }
-  goOn->set_value();
+  proceed->set_value();
   ended->get_future().wait();
 }
 

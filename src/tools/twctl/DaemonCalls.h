@@ -18,12 +18,12 @@ struct DaemonFailure {
 };
 
 // A command's connection to the daemon. What goes wrong is printed and becomes the tool's exit status.
-class Daemon {
+class DaemonCalls {
  public:
   using Answer = DaemonConnection::Answer;
 
   // `tool` outlives it.
-  explicit Daemon(Tool& tool) : tool_(tool) {}
+  explicit DaemonCalls(Tool& tool) : tool_(tool) {}
 
   // An onlooker asks and changes nothing; the daemon refuses what would, and keeps no record of its visit.
   enum class Role { kClient, kOnlooker };

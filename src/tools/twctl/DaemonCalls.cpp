@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "tools/twctl/Daemon.h"
+#include "tools/twctl/DaemonCalls.h"
 
 #include <chrono>
 #include <memory>
@@ -19,7 +19,7 @@ bool isTooLarge(const std::error_code& error) {
 
 }  // namespace
 
-bool Daemon::connect(Role role) {
+bool DaemonCalls::connect(Role role) {
   const std::vector<std::string> paths = tool_.socketPaths();
   const std::error_code error = client_.connect(paths);
   if (!error) {
@@ -34,7 +34,7 @@ bool Daemon::connect(Role role) {
   return false;
 }
 
-bool Daemon::call(std::string_view method, const Arguments& arguments, std::optional<Value>& result) {
+bool DaemonCalls::call(std::string_view method, const Arguments& arguments, std::optional<Value>& result) {
   std::error_code error;
   const std::optional<Answer> answer = client_.call(method, arguments, kAnswerTimeout, error);
   if (!answer) {
@@ -50,9 +50,9 @@ bool Daemon::call(std::string_view method, const Arguments& arguments, std::opti
   return true;
 }
 
-std::optional<Value> Daemon::await(std::string_view method, const Arguments& arguments,
-                                   const std::function<bool(int descriptor)>& waitReadable,
-                                   std::optional<DaemonFailure>& failure) {
+std::optional<Value> DaemonCalls::await(std::string_view method, const Arguments& arguments,
+                                        const std::function<bool(int descriptor)>& waitReadable,
+                                        std::optional<DaemonFailure>& failure) {
   // Shared, because who gives up leaves the handler behind.
   const auto answer = std::make_shared<std::optional<Answer>>();
   std::error_code error =
@@ -73,7 +73,7 @@ std::optional<Value> Daemon::await(std::string_view method, const Arguments& arg
   return std::nullopt;
 }
 
-std::string Daemon::describe(std::string_view method, const ReplyError& error) {
+std::string DaemonCalls::describe(std::string_view method, const ReplyError& error) {
   std::string text(method);
   text += ": ";
   if (!error.message.empty()) return text + error.message;

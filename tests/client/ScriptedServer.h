@@ -122,9 +122,9 @@ class ScriptedConnection {
 };
 
 // A socket at which clients knock.
-class ScriptedDaemon {
+class ScriptedServer {
  public:
-  explicit ScriptedDaemon(const std::string& path) {
+  explicit ScriptedServer(const std::string& path) {
     ::unlink(path.c_str());
     const std::optional<sockaddr_un> address = unixAddressOf(path);
     listener_.reset(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
