@@ -8,7 +8,7 @@
 
 #include "platform/linux/protobuf/ProtozeroReader.h"
 #include "platform/linux/protobuf/ProtozeroWriter.h"
-#include "workers/sinks/AudioIssueDetected.h"
+#include "platform/pb/AudioIssueDetected.h"
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
   tonewerk::ProtozeroReader reader(std::string_view(reinterpret_cast<const char*>(data), size));

@@ -7,7 +7,7 @@
 #include <string>
 #include <string_view>
 
-#include "platform/RequestSet.h"
+#include "protocol/RequestSet.h"
 #include "tonewerk/reporting.h"
 
 namespace tonewerk {

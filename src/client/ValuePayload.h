@@ -7,7 +7,7 @@
 #include <string>
 #include <vector>
 
-#include "platform/RequestSet.h"
+#include "protocol/RequestSet.h"
 #include "tonewerk/reporting.h"
 #include "values/Value.h"
 

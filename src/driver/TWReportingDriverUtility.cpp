@@ -8,7 +8,7 @@
 #include <utility>
 
 #include "platform/LogLine.h"
-#include "session/AudioEvent.h"
+#include "protocol/AudioEvent.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionMessage.h"

@@ -5,11 +5,11 @@
 #include <mutex>
 #include <utility>
 
-#include "monitor/FeatureTable.h"
 #include "platform/Clock.h"
 #include "platform/LogLine.h"
 #include "platform/PreferenceStore.h"
 #include "platform/SystemInformation.h"
+#include "protocol/FeatureTable.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingUtility.h"

@@ -6,7 +6,7 @@
 #include <memory>
 #include <string>
 
-#include "platform/RequestSet.h"
+#include "protocol/RequestSet.h"
 
 namespace tonewerk {
 

@@ -6,7 +6,7 @@
 #include <cstdint>
 #include <vector>
 
-#include "session/AudioEvent.h"
+#include "protocol/AudioEvent.h"
 
 namespace tonewerk {
 

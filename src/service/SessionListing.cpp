@@ -9,9 +9,9 @@
 #include <vector>
 
 #include "platform/Clock.h"
+#include "protocol/WatchKeys.h"
 #include "service/TWReportingClientServerInstance.h"
 #include "service/TWReportingServiceDelegateProtocol.h"
-#include "service/WatchKeys.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingSession.h"
 

@@ -11,8 +11,8 @@
 #include <string>
 
 #include "platform/Log.h"
+#include "protocol/AudioEvent.h"
 #include "service/TWReportingServiceProtocol.h"
-#include "session/AudioEvent.h"
 #include "session/KeptBytesBudget.h"
 
 namespace tonewerk {

@@ -5,7 +5,7 @@
 #include <optional>
 #include <vector>
 
-#include "session/AudioEvent.h"
+#include "protocol/AudioEvent.h"
 
 namespace tonewerk {
 

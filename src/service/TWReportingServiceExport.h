@@ -5,7 +5,7 @@
 #include <memory>
 #include <optional>
 
-#include "platform/RequestSet.h"
+#include "protocol/RequestSet.h"
 #include "service/TWReportingServiceProtocol.h"
 
 namespace tonewerk {

@@ -5,8 +5,8 @@
 #include <string_view>
 #include <vector>
 
-#include "platform/RequestSet.h"
-#include "session/AudioEvent.h"
+#include "protocol/AudioEvent.h"
+#include "protocol/RequestSet.h"
 #include "values/Value.h"
 
 namespace tonewerk {

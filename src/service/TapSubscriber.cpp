@@ -5,7 +5,7 @@
 #include <vector>
 
 #include "platform/SerialQueue.h"
-#include "service/WatchKeys.h"
+#include "protocol/WatchKeys.h"
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionMessage.h"

@@ -6,9 +6,9 @@
 #include <deque>
 #include <memory>
 
-#include "platform/RequestSet.h"
+#include "protocol/AudioEvent.h"
+#include "protocol/RequestSet.h"
 #include "service/MessageFilter.h"
-#include "session/AudioEvent.h"
 #include "values/Value.h"
 
 namespace tonewerk {

@@ -6,7 +6,7 @@
 #include <memory>
 #include <vector>
 
-#include "platform/RequestSet.h"
+#include "protocol/RequestSet.h"
 
 namespace tonewerk {
 

@@ -11,7 +11,7 @@
 #include "platform/LogCategory.h"
 #include "platform/Platform.h"
 #include "platform/SerialQueue.h"
-#include "session/AudioEvent.h"
+#include "protocol/AudioEvent.h"
 #include "session/SingletonRegistry.h"
 #include "session/SinkQueue.h"
 #include "session/StrandPool.h"

@@ -5,7 +5,7 @@
 #include <unordered_map>
 #include <vector>
 
-#include "session/AudioEvent.h"
+#include "protocol/AudioEvent.h"
 #include "values/SharedString.h"
 
 namespace tonewerk {

@@ -12,8 +12,8 @@
 #include <utility>
 #include <vector>
 
-#include "platform/RequestSet.h"
-#include "session/AudioEvent.h"
+#include "protocol/AudioEvent.h"
+#include "protocol/RequestSet.h"
 #include "session/KeptBytesBudget.h"
 #include "session/TWReportingSessionMessage.h"
 #include "session/TWReportingSessionWorkerClass.h"

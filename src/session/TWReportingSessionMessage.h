@@ -6,7 +6,7 @@
 #include <string>
 #include <vector>
 
-#include "session/AudioEvent.h"
+#include "protocol/AudioEvent.h"
 #include "values/Value.h"
 
 namespace tonewerk {

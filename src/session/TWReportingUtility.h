@@ -10,7 +10,7 @@
 #include <string_view>
 
 #include "platform/LogCategory.h"
-#include "session/AudioEvent.h"
+#include "protocol/AudioEvent.h"
 #include "values/Value.h"
 
 namespace tonewerk {

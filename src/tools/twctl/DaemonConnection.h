@@ -10,7 +10,7 @@
 #include <system_error>
 #include <vector>
 
-#include "platform/RequestSet.h"
+#include "protocol/RequestSet.h"
 #include "values/Value.h"
 
 namespace tonewerk {

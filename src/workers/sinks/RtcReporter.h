@@ -8,7 +8,7 @@
 #include <string>
 
 #include "platform/LinkReport.h"
-#include "session/AudioEvent.h"
+#include "protocol/AudioEvent.h"
 #include "session/TWReportingSessionMessage.h"
 
 namespace tonewerk {

@@ -8,7 +8,7 @@
 #include <system_error>
 #include <unordered_map>
 
-#include "session/AudioEvent.h"
+#include "protocol/AudioEvent.h"
 #include "values/Value.h"
 
 namespace tonewerk {

@@ -6,10 +6,10 @@
 
 #include "platform/Diagwire.h"
 #include "platform/LogLine.h"
+#include "platform/pb/AudioIssueDetected.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingSessionMessage.h"
 #include "session/TWReportingUtility.h"
-#include "workers/sinks/AudioIssueDetected.h"
 
 namespace tonewerk {
 namespace {

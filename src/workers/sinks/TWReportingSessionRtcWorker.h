@@ -4,7 +4,7 @@
 #include <cstdint>
 #include <memory>
 
-#include "session/AudioEvent.h"
+#include "protocol/AudioEvent.h"
 #include "session/TWReportingSessionWorkerClass.h"
 
 namespace tonewerk {

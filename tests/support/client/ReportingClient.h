@@ -11,7 +11,7 @@
 #include <system_error>
 #include <vector>
 
-#include "platform/RequestSet.h"
+#include "protocol/RequestSet.h"
 #include "values/Value.h"
 
 namespace tonewerk {

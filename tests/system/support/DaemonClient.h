@@ -7,7 +7,7 @@
 #include <string_view>
 #include <vector>
 
-#include "session/AudioEvent.h"
+#include "protocol/AudioEvent.h"
 #include "support/client/ReportingClient.h"
 #include "values/Value.h"
 

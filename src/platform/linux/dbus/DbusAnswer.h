@@ -4,8 +4,8 @@
 #include <optional>
 #include <string>
 
-#include "platform/RequestSet.h"
 #include "platform/linux/dbus/SdBus.h"
+#include "protocol/RequestSet.h"
 
 namespace tonewerk {
 

@@ -4,9 +4,9 @@
 #include <cstddef>
 #include <optional>
 
-#include "platform/RequestSet.h"
 #include "platform/linux/dbus/DbusInterface.h"
 #include "platform/linux/messagepack/RpcFrameReader.h"
+#include "protocol/RequestSet.h"
 
 struct sd_bus_message;
 

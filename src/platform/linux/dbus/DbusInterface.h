@@ -6,7 +6,7 @@
 #include <string_view>
 #include <vector>
 
-#include "platform/RequestSet.h"
+#include "protocol/RequestSet.h"
 
 struct sd_bus_vtable;
 

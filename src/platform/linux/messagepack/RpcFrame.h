@@ -6,7 +6,7 @@
 #include <optional>
 #include <string>
 
-#include "platform/RequestSet.h"
+#include "protocol/RequestSet.h"
 #include "values/Value.h"
 
 namespace tonewerk {

@@ -6,7 +6,7 @@
 #include <string>
 #include <string_view>
 
-#include "platform/RequestSet.h"
+#include "protocol/RequestSet.h"
 #include "values/Value.h"
 
 namespace tonewerk {

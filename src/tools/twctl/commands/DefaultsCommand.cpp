@@ -8,12 +8,12 @@
 #include <system_error>
 #include <vector>
 
-#include "monitor/FeatureTable.h"
 #include "platform/LogCategory.h"
 #include "platform/PreferenceSchema.h"
 #include "platform/linux/notifications/NotificationFiles.h"
 #include "platform/linux/preferences/TomlPreferenceStore.h"
 #include "platform/linux/preferences/TomlText.h"
+#include "protocol/FeatureTable.h"
 #include "tools/twctl/ToolLog.h"
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/input/PreferenceCheck.h"

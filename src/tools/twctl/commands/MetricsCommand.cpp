@@ -7,10 +7,10 @@
 #include "platform/linux/json/ValueMapFormatter.h"
 #include "platform/linux/protobuf/ProtozeroReader.h"
 #include "platform/linux/store/StoreReader.h"
+#include "platform/pb/AudioIssueDetected.h"
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/input/EventFilterOptions.h"
 #include "tools/twctl/show/Table.h"
-#include "workers/sinks/AudioIssueDetected.h"
 
 namespace tonewerk {
 namespace {

@@ -3,7 +3,7 @@
 
 #include <optional>
 
-#include "session/AudioEvent.h"
+#include "protocol/AudioEvent.h"
 
 namespace tonewerk {
 

@@ -8,7 +8,7 @@
 #include <string>
 #include <vector>
 
-#include "service/WatchKeys.h"
+#include "protocol/WatchKeys.h"
 #include "tools/twctl/DaemonCalls.h"
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/commands/LiveEvents.h"

@@ -5,7 +5,7 @@
 #include <string>
 #include <string_view>
 
-#include "session/AudioEvent.h"
+#include "protocol/AudioEvent.h"
 #include "values/Value.h"
 
 namespace tonewerk {

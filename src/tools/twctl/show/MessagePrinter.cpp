@@ -4,7 +4,7 @@
 #include <ostream>
 #include <string>
 
-#include "service/WatchKeys.h"
+#include "protocol/WatchKeys.h"
 #include "session/TWReportingUtility.h"
 #include "tools/twctl/Tool.h"
 #include "tools/twctl/show/PrintableText.h"

@@ -4,7 +4,7 @@
 #include <algorithm>
 #include <utility>
 
-#include "service/WatchKeys.h"
+#include "protocol/WatchKeys.h"
 
 namespace tonewerk {
 

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include "session/AudioEvent.h"
+#include "protocol/AudioEvent.h"
 #include "tools/twctl/Tool.h"
 #include "tools/twctl/show/Table.h"
 

@@ -7,7 +7,7 @@
 #include <sstream>
 #include <utility>
 
-#include "service/WatchKeys.h"
+#include "protocol/WatchKeys.h"
 #include "tools/twctl/show/PrintableText.h"
 #include "tools/twctl/show/Table.h"
 

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // The metric record through the real encoding.
-#include "workers/sinks/AudioIssueDetected.h"
+#include "platform/pb/AudioIssueDetected.h"
 
 #include <array>
 #include <cstdio>

@@ -7,12 +7,12 @@
 #include "platform/linux/protobuf/ProtozeroReader.h"
 #include "platform/linux/store/ReportStore.h"
 #include "platform/linux/store/SqliteDatabase.h"
+#include "platform/pb/AudioIssueDetected.h"
 #include "support/TemporaryDirectory.h"
 #include "support/manual/ManualClock.h"
 #include "support/memory/MemoryJsonService.h"
 #include "support/memory/MemoryLog.h"
 #include "support/memory/MemoryPreferenceStore.h"
-#include "workers/sinks/AudioIssueDetected.h"
 
 namespace tonewerk {
 namespace {

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "platform/RequestSet.h"
+#include "protocol/RequestSet.h"
 
 #include <gtest/gtest.h>
 #include <limits>

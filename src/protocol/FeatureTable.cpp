@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "monitor/FeatureTable.h"
+#include "protocol/FeatureTable.h"
 
 namespace tonewerk {
 

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "workers/sinks/AudioIssueDetected.h"
+#include "platform/pb/AudioIssueDetected.h"
 
 #include "platform/pb/Reader.h"
 #include "platform/pb/TextFormatter.h"
