@@ -5,6 +5,7 @@
 
 #include "client/RequestBody.h"
 #include "platform/linux/messagepack/RpcPacker.h"
+#include "protocol/Requests.h"
 
 namespace tonewerk {
 namespace {
@@ -73,7 +74,7 @@ std::size_t appendMessageFrame(std::string& out, std::optional<std::uint32_t> re
   appendFrameHead(out, requestIdentifier);
   StringOutput output{out};
   RpcPacker packer(output);
-  packer.text("sendMessage");
+  packer.text(requests::kSendMessage.name);
   packer.pack_array(4);
   packer.pack_map(message.entries + (stamps ? 1U : 0U) + (tellsLoss ? 1U : 0U));
   const std::size_t payloadAt = out.size();

@@ -5,6 +5,7 @@
 #include <utility>
 
 #include "client/RequestBody.h"
+#include "protocol/Requests.h"
 
 namespace tonewerk {
 
@@ -73,17 +74,19 @@ std::vector<SessionChange> changesBetween(const SessionState& from, const Sessio
 void appendChange(std::string& out, const SessionChange& change, std::int64_t reporterID) {
   switch (change.kind) {
     case Kind::kCreate:
-      return appendRequestBody(out, "createReportingSession", {Value(reporterID)});
+      return appendRequestBody(out, requests::kCreateReportingSession.name, {Value(reporterID)});
     case Kind::kServiceType:
-      return appendRequestBody(out, "setServiceType", {Value(change.serviceType), Value(reporterID)});
+      return appendRequestBody(out, requests::kSetServiceType.name,
+                               {Value(change.serviceType), Value(reporterID)});
     case Kind::kConfiguration:
-      return appendRequestBody(out, "setConfiguration", {Value(change.configuration), Value(reporterID)});
+      return appendRequestBody(out, requests::kSetConfiguration.name,
+                               {Value(change.configuration), Value(reporterID)});
     case Kind::kStart:
-      return appendRequestBody(out, "startReportingSessionForID", {Value(reporterID)});
+      return appendRequestBody(out, requests::kStartReportingSessionForID.name, {Value(reporterID)});
     case Kind::kStop:
-      return appendRequestBody(out, "stopReportingSessionForID", {Value(reporterID)});
+      return appendRequestBody(out, requests::kStopReportingSessionForID.name, {Value(reporterID)});
     case Kind::kDestroy:
-      return appendRequestBody(out, "destroyReportingSession", {Value(reporterID)});
+      return appendRequestBody(out, requests::kDestroyReportingSession.name, {Value(reporterID)});
   }
 }
 

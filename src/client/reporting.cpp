@@ -22,6 +22,7 @@
 #include "client/SocketPaths.h"
 #include "platform/linux/files/Utf8.h"
 #include "platform/linux/messagepack/RpcLimits.h"
+#include "protocol/Requests.h"
 
 namespace tonewerk {
 namespace {
@@ -206,20 +207,21 @@ twr_status twr_client_send(twr_client* client, uint32_t category, uint16_t type,
 
 twr_status twr_client_get_service_type(twr_client* client, int64_t reporterID, twr_reply reply,
                                        void* context) {
-  return ask(client, "getServiceNameForReporterID", {Value(reporterID)},
+  return ask(client, requests::kGetServiceNameForReporterID.name, {Value(reporterID)},
              {reply, context, AnswerKind::kServiceType});
 }
 
 twr_status twr_client_validate(twr_client* client, int64_t reporterID, twr_reply reply, void* context) {
-  return ask(client, "reporterIDValid", {Value(reporterID)}, {reply, context, AnswerKind::kValidity});
+  return ask(client, requests::kReporterIDValid.name, {Value(reporterID)},
+             {reply, context, AnswerKind::kValidity});
 }
 
 twr_status twr_client_get_all_reporters(twr_client* client, twr_reply reply, void* context) {
-  return ask(client, "getAllReporters", {}, {reply, context, AnswerKind::kReporters});
+  return ask(client, requests::kGetAllReporters.name, {}, {reply, context, AnswerKind::kReporters});
 }
 
 twr_status twr_client_kill_service(twr_client* client, twr_reply reply, void* context) {
-  return ask(client, "killService", {}, {reply, context});
+  return ask(client, requests::kKillService.name, {}, {reply, context});
 }
 
 twr_status twr_client_request(twr_client* client, const char* method, const twr_payload* parameters,

@@ -6,7 +6,7 @@
 #include <memory>
 #include <string>
 
-#include "protocol/RequestSet.h"
+#include "platform/RequestHandler.h"
 
 namespace tonewerk {
 

@@ -1,8 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <array>
+#include <cstddef>
 #include <cstdint>
-#include <memory>
+#include <initializer_list>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -16,10 +18,31 @@ enum class ParameterType { kInt64, kUInt32, kUInt16, kMap, kInt64ListOrNone };
 
 struct Parameter {
   std::string_view name;
-  ParameterType type;
+  ParameterType type = ParameterType::kInt64;
 };
 
-// kAny is for objects that answer with whatever they like, kNever for requests that are not answered.
+// The parameters of one request, in order. A request has no more than kMaxParameters.
+class ParameterList {
+ public:
+  static constexpr std::size_t kMaxParameters = 4;
+
+  constexpr ParameterList() = default;
+  constexpr ParameterList(std::initializer_list<Parameter> parameters) {
+    for (const Parameter& parameter : parameters) parameters_.at(size_++) = parameter;
+  }
+
+  constexpr std::size_t size() const { return size_; }
+  constexpr bool empty() const { return size_ == 0; }
+  constexpr const Parameter& operator[](std::size_t at) const { return parameters_[at]; }
+  constexpr const Parameter* begin() const { return parameters_.data(); }
+  constexpr const Parameter* end() const { return parameters_.data() + size_; }
+
+ private:
+  std::array<Parameter, kMaxParameters> parameters_{};
+  std::size_t size_ = 0;
+};
+
+// kAny is for handlers that answer with whatever they like, kNever for requests that are not answered.
 enum class ResultType { kNone, kBoolean, kUInt16, kMap, kInt64List, kAny, kNever };
 
 // What a request is answered with. Not every transport needs to know, and none checks it.
@@ -28,10 +51,10 @@ struct Result {
   std::string_view name;
 };
 
-// One request that an exported object understands.
+// One request that a handler understands.
 struct Method {
   std::string_view name;
-  std::vector<Parameter> parameters;
+  ParameterList parameters = {};
   Result result = {};
   // What an answer may come to. It counts against the connection's bound from the request on, since an answer
   // is only measured when it is too late to refuse it.
@@ -39,9 +62,12 @@ struct Method {
   // Only for the user the daemon runs as, and root: what shows more of other clients than their identifiers.
   // Front ends that do not know their peers' users leave such methods out.
   bool forOwner = false;
+  // Whether it changes sessions or the daemon, rather than asks about them. A connection that only observes
+  // may not make such a request.
+  bool changesState = false;
 };
 
-// The request set of an exported object. A request names its method by the place in `methods`.
+// The requests that a handler understands. A request names its method by the place in `methods`.
 struct RequestSet {
   std::vector<Method> methods;
 
@@ -52,7 +78,7 @@ struct RequestSet {
 using Argument = std::optional<Value>;
 using Arguments = std::vector<Argument>;
 
-// What is wrong with `arguments` for `method` in words that name the argument, or none. An object gets only
+// What is wrong with `arguments` for `method` in words that name the argument, or none. A handler gets only
 // requests with which nothing is wrong.
 std::optional<std::string> problemWith(const Method& method, const Arguments& arguments);
 
@@ -79,74 +105,5 @@ inline constexpr std::uint32_t kNoUser = 0xFFFF'FFFF;
 
 // Why a peer of that user may not call `method` in a daemon that runs as `owner`, or none.
 std::optional<ReplyError> problemWithCaller(const Method& method, std::uint32_t user, std::uint32_t owner);
-
-// Takes answers. Any thread.
-class ReplySink {
- public:
-  virtual ~ReplySink() = default;
-  // `result` none is nil. With an error there is no result.
-  virtual void reply(std::uint32_t requestIdentifier, const std::optional<ReplyError>& error,
-                     const std::optional<Value>& result) = 0;
-};
-
-// The way back to whoever sent a request. Copyable; may be called never, once or several times, on any
-// thread, also when the peer is gone. An empty one swallows its answer: a notification's.
-class Reply {
- public:
-  Reply() = default;
-  Reply(std::shared_ptr<ReplySink> sink, std::uint32_t requestIdentifier)
-      : sink_(std::move(sink)), requestIdentifier_(requestIdentifier) {}
-
-  void operator()(const std::optional<ReplyError>& error,
-                  const std::optional<Value>& result = std::nullopt) const {
-    if (sink_ != nullptr) sink_->reply(requestIdentifier_, error, result);
-  }
-
- private:
-  std::shared_ptr<ReplySink> sink_;
-  std::uint32_t requestIdentifier_ = 0;
-};
-
-// Counts the requests of one connection that are not finished. Any thread.
-class InFlightCounter {
- public:
-  virtual ~InFlightCounter() = default;
-  virtual void finished(std::size_t bytes) = 0;
-};
-
-// Says, by its destruction, that a request's body has run. Whoever carries the body to a queue carries this
-// with it.
-class InFlightToken {
- public:
-  InFlightToken() = default;
-  InFlightToken(std::shared_ptr<InFlightCounter> gauge, std::size_t bytes)
-      : gauge_(std::move(gauge)), bytes_(bytes) {}
-  InFlightToken(InFlightToken&&) noexcept = default;
-  InFlightToken& operator=(InFlightToken&& other) noexcept {
-    finish();
-    gauge_ = std::move(other.gauge_);
-    bytes_ = other.bytes_;
-    return *this;
-  }
-  ~InFlightToken() { finish(); }
-
- private:
-  void finish() {
-    if (gauge_ != nullptr) gauge_->finished(bytes_);
-    gauge_ = nullptr;
-  }
-
-  std::shared_ptr<InFlightCounter> gauge_;
-  std::size_t bytes_ = 0;
-};
-
-// What a connection's requests are made to.
-class RequestHandler {
- public:
-  virtual ~RequestHandler() = default;
-
-  // On the messaging thread, in the order of arrival; must not block. `arguments` suit the method.
-  virtual void handleRequest(std::size_t method, Arguments arguments, Reply reply, InFlightToken token) = 0;
-};
 
 }  // namespace tonewerk

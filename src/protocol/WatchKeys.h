@@ -1,12 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <cstddef>
-#include <string_view>
-
-#include "session/TWReportingUtility.h"
-#include "values/ShortenedText.h"
-#include "values/Value.h"
+#include "values/SharedString.h"
 
 namespace tonewerk {
 
@@ -29,13 +24,5 @@ inline const SharedString kWatchKeySingleMessageSession("singleMessageSession");
 inline const SharedString kWatchKeyProcessIdentifier("processIdentifier");
 inline const SharedString kWatchKeyProcessName("processName");
 inline const SharedString kWatchKeySeconds("seconds");
-
-// Names that clients choose are shown this long and no longer.
-inline constexpr std::size_t kMaxShownNameBytes = 256;
-
-// The application that a configuration, or a payload on its way to the workers, names.
-inline Value shownApplication(const ValueMap& map) {
-  return shortened(TWReportingUtilityRetrieveAppName(map), kMaxShownNameBytes);
-}
 
 }  // namespace tonewerk

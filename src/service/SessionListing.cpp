@@ -14,8 +14,15 @@
 #include "service/TWReportingServiceDelegateProtocol.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingSession.h"
+#include "session/TWReportingUtility.h"
+#include "values/ShortenedText.h"
 
 namespace tonewerk {
+
+Value shownApplication(const ValueMap& map) {
+  return shortened(TWReportingUtilityRetrieveAppName(map), kMaxShownNameBytes);
+}
+
 namespace {
 
 // A portion of a long row.

@@ -7,6 +7,7 @@
 
 #include "platform/LogLine.h"
 #include "platform/SerialQueue.h"
+#include "protocol/Requests.h"
 #include "service/MessageTap.h"
 #include "service/TWReportingServiceDelegateProtocol.h"
 #include "session/TWReportingSession.h"

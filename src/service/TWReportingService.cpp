@@ -11,10 +11,11 @@
 #include "platform/LogLine.h"
 #include "platform/ProcessInformation.h"
 #include "platform/SerialQueue.h"
+#include "protocol/Requests.h"
 #include "service/ClientUptime.h"
 #include "service/TWReportingClientServerInstance.h"
 #include "service/TWReportingServiceExport.h"
-#include "service/WatchExport.h"
+#include "service/WatchRequests.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingSession.h"
@@ -57,9 +58,9 @@ bool TWReportingService::listenerShouldAcceptNewConnection(MessagingConnection& 
       if (service != nullptr && listed != nullptr) registerClient(listed);
     });
     connection.exportObject(
-        TWReportingServiceExport::requestSet(),
+        requests::all(),
         std::make_shared<TWReportingServiceExport>(
-            std::move(client), std::make_unique<WatchExport>(processIdentifier, weak_from_this())));
+            std::move(client), std::make_unique<WatchRequests>(processIdentifier, weak_from_this())));
   }
   connection.setInterruptionHandler([weakClient] {
     const auto client = weakClient.lock();

@@ -1,51 +1,19 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "service/TWReportingServiceExport.h"
 
+#include <algorithm>
+#include <cassert>
+#include <iterator>
 #include <string>
+#include <string_view>
 #include <utility>
 #include <vector>
 
-#include "service/WatchExport.h"
+#include "protocol/Requests.h"
+#include "service/WatchRequests.h"
 
 namespace tonewerk {
 namespace {
-
-// In the order of the table below.
-enum ServiceMethod : std::size_t {
-  kCreateReportingSession,
-  kSetServiceType,
-  kGetServiceNameForReporterID,
-  kSetConfiguration,
-  kStartReportingSessionForID,
-  kSendMessage,
-  kStopReportingSessionForID,
-  kDestroyReportingSession,
-  kReporterIDValid,
-  kGetAllReporters,
-  kKillService,
-  kObserve,
-  kFirstWatchMethod,
-};
-
-// Whether it changes sessions or the daemon, rather than asks about them.
-bool changesSomething(std::size_t method) {
-  switch (method) {
-    case kCreateReportingSession:
-    case kSetServiceType:
-    case kSetConfiguration:
-    case kStartReportingSessionForID:
-    case kSendMessage:
-    case kStopReportingSessionForID:
-    case kDestroyReportingSession:
-    case kKillService:
-      return true;
-    default:
-      return false;
-  }
-}
-
-// Of a list of reporter identifiers: what some ten clients with all the sessions they may have come to.
-constexpr std::size_t kMaxListBytes = std::size_t{512} << 10;
 
 ReporterID reporterIDOf(const Argument& argument) { return argument->integer(); }
 AudioServiceType serviceTypeOf(const Argument& argument) {
@@ -61,56 +29,120 @@ TWReportingServiceProtocol::ReporterIDs reporterIDsOf(const Argument& argument) 
   return identifiers;
 }
 
-std::vector<Method> requestMethods() {
-  constexpr Parameter kReporterID{"reporterID", ParameterType::kInt64};
-  constexpr Parameter kServiceType{"serviceType", ParameterType::kUInt16};
-  constexpr Result kSuccess{ResultType::kBoolean, "success"};
-  return {
-      {"createReportingSession", {kReporterID}, kSuccess},
-      {"setServiceType", {kServiceType, kReporterID}, kSuccess},
-      {"getServiceNameForReporterID", {kReporterID}, {ResultType::kUInt16, "serviceType"}},
-      {"setConfiguration", {{"configuration", ParameterType::kMap}, kReporterID}, kSuccess},
-      {"startReportingSessionForID", {kReporterID}, kSuccess},
-      {"sendMessage",
-       {{"message", ParameterType::kMap},
-        {"category", ParameterType::kUInt32},
-        {"type", ParameterType::kUInt16},
-        {"reporterIDs", ParameterType::kInt64ListOrNone}}},
-      {"stopReportingSessionForID", {kReporterID}, kSuccess},
-      {"destroyReportingSession", {kReporterID}, kSuccess},
-      {"reporterIDValid", {kReporterID}, {ResultType::kMap, "validity"}},
-      {"getAllReporters", {}, {ResultType::kInt64List, "reporterIDs"}, kMaxListBytes},
-      {"killService", {}, {ResultType::kNever, ""}},
-      {"observe", {}, kSuccess},
-  };
+// Where a connection's requests go.
+struct Targets {
+  TWReportingServiceProtocol& service;
+  WatchRequests& watch;
+};
+
+// What a request brought beside its method. A handler moves out of it.
+struct Incoming {
+  Arguments arguments;
+  Reply reply;
+  InFlightToken token;
+
+  ServiceRequest request() { return {std::move(reply), std::move(token)}; }
+};
+
+void sendMessage(const Targets& to, Incoming& in) {
+  ValueMap message = *in.arguments[0]->asMap();
+  const auto category = static_cast<AudioEventCategory>(in.arguments[1]->integer());
+  const auto type = static_cast<AudioEventType>(in.arguments[2]->integer());
+  auto identifiers = reporterIDsOf(in.arguments[3]);
+  // Let go first, so that the message's storage is not shared and the session need not copy it to change it.
+  in.arguments.clear();
+  to.service.sendMessage(std::move(message), category, type, std::move(identifiers), in.request());
+}
+
+struct Handler {
+  std::string_view name;
+  void (*run)(const Targets& to, Incoming& in);
+};
+
+const Handler kHandlers[] = {
+    {requests::kCreateReportingSession.name,
+     [](const Targets& to, Incoming& in) {
+       to.service.createReportingSession(reporterIDOf(in.arguments[0]), in.request());
+     }},
+    {requests::kSetServiceType.name,
+     [](const Targets& to, Incoming& in) {
+       to.service.setServiceType(serviceTypeOf(in.arguments[0]), reporterIDOf(in.arguments[1]), in.request());
+     }},
+    {requests::kGetServiceNameForReporterID.name,
+     [](const Targets& to, Incoming& in) {
+       to.service.getServiceNameForReporterID(reporterIDOf(in.arguments[0]), in.request());
+     }},
+    {requests::kSetConfiguration.name,
+     [](const Targets& to, Incoming& in) {
+       to.service.setConfiguration(*in.arguments[0]->asMap(), reporterIDOf(in.arguments[1]), in.request());
+     }},
+    {requests::kStartReportingSessionForID.name,
+     [](const Targets& to, Incoming& in) {
+       to.service.startReportingSessionForID(reporterIDOf(in.arguments[0]), in.request());
+     }},
+    {requests::kSendMessage.name, sendMessage},
+    {requests::kStopReportingSessionForID.name,
+     [](const Targets& to, Incoming& in) {
+       to.service.stopReportingSessionForID(reporterIDOf(in.arguments[0]), in.request());
+     }},
+    {requests::kDestroyReportingSession.name,
+     [](const Targets& to, Incoming& in) {
+       to.service.destroyReportingSession(reporterIDOf(in.arguments[0]), in.request());
+     }},
+    {requests::kReporterIDValid.name,
+     [](const Targets& to, Incoming& in) {
+       to.service.reporterIDValid(reporterIDOf(in.arguments[0]), in.request());
+     }},
+    {requests::kGetAllReporters.name,
+     [](const Targets& to, Incoming& in) { to.service.getAllReporters(in.request()); }},
+    {requests::kKillService.name, [](const Targets& to, Incoming&) { to.service.killService(); }},
+    {requests::kObserve.name, [](const Targets& to, Incoming& in) { to.service.observe(in.request()); }},
+    {requests::kWatchSessions.name,
+     [](const Targets& to, Incoming& in) {
+       to.watch.sessions(in.arguments, std::move(in.reply), std::move(in.token));
+     }},
+    {requests::kWatchOpenMessages.name,
+     [](const Targets& to, Incoming& in) {
+       to.watch.openMessages(in.arguments, std::move(in.reply), std::move(in.token));
+     }},
+    {requests::kWatchNextMessages.name,
+     [](const Targets& to, Incoming& in) {
+       to.watch.nextMessages(std::move(in.reply), std::move(in.token));
+     }},
+};
+
+// The handlers in the order of requests::all().
+const std::vector<const Handler*>& handlers() {
+  static const std::vector<const Handler*> inOrder = [] {
+    std::vector<const Handler*> found;
+    for (const Method& method : requests::all().methods) {
+      const auto* handler = std::find_if(std::begin(kHandlers), std::end(kHandlers),
+                                         [&](const Handler& each) { return each.name == method.name; });
+      assert(handler != std::end(kHandlers));
+      found.push_back(handler);
+    }
+    return found;
+  }();
+  return inOrder;
 }
 
 }  // namespace
 
 TWReportingServiceExport::TWReportingServiceExport(std::shared_ptr<TWReportingServiceProtocol> object,
-                                                   std::unique_ptr<RequestHandler> watch)
+                                                   std::unique_ptr<WatchRequests> watch)
     : object_(std::move(object)), watch_(std::move(watch)) {}
 
-const RequestSet& TWReportingServiceExport::requestSet() {
-  static const RequestSet interface = [] {
-    RequestSet all{requestMethods()};
-    const std::vector<Method>& watch = WatchExport::methods();
-    all.methods.insert(all.methods.end(), watch.begin(), watch.end());
-    return all;
-  }();
-  return interface;
-}
+TWReportingServiceExport::~TWReportingServiceExport() = default;
 
-std::optional<ReplyError> TWReportingServiceExport::takeRole(std::size_t method) {
-  if (method == kObserve) {
+std::optional<ReplyError> TWReportingServiceExport::takeRole(const Method& method) {
+  if (method.name == requests::kObserve.name) {
     if (role_ == Role::kClient)
       return messagingError(kNotPermitted, "not permitted: observe comes before what changes something");
     role_ = Role::kOnlooker;
-  } else if (changesSomething(method)) {
+  } else if (method.changesState) {
     if (role_ == Role::kOnlooker) {
       return messagingError(kNotPermitted, "not permitted: the connection only looks on since observe, and " +
-                                               std::string(requestSet().methods[method].name) +
-                                               " changes something");
+                                               std::string(method.name) + " changes something");
     }
     role_ = Role::kClient;
   }
@@ -119,50 +151,9 @@ std::optional<ReplyError> TWReportingServiceExport::takeRole(std::size_t method)
 
 void TWReportingServiceExport::handleRequest(std::size_t method, Arguments arguments, Reply reply,
                                              InFlightToken token) {
-  if (const std::optional<ReplyError> error = takeRole(method)) return reply(error);
-  if (method >= kFirstWatchMethod) {
-    return watch_->handleRequest(method - kFirstWatchMethod, std::move(arguments), std::move(reply),
-                                 std::move(token));
-  }
-  ServiceRequest request{std::move(reply), std::move(token)};
-  switch (method) {
-    case kCreateReportingSession:
-      return object_->createReportingSession(reporterIDOf(arguments[0]), std::move(request));
-    case kSetServiceType:
-      return object_->setServiceType(serviceTypeOf(arguments[0]), reporterIDOf(arguments[1]),
-                                     std::move(request));
-    case kGetServiceNameForReporterID:
-      return object_->getServiceNameForReporterID(reporterIDOf(arguments[0]), std::move(request));
-    case kSetConfiguration:
-      return object_->setConfiguration(*arguments[0]->asMap(), reporterIDOf(arguments[1]),
-                                       std::move(request));
-    case kStartReportingSessionForID:
-      return object_->startReportingSessionForID(reporterIDOf(arguments[0]), std::move(request));
-    case kSendMessage: {
-      ValueMap message = *arguments[0]->asMap();
-      const auto category = static_cast<AudioEventCategory>(arguments[1]->integer());
-      const auto type = static_cast<AudioEventType>(arguments[2]->integer());
-      auto identifiers = reporterIDsOf(arguments[3]);
-      arguments.clear();  // so that the message's storage is not shared, and the session need not copy it to
-                          // change it
-      return object_->sendMessage(std::move(message), category, type, std::move(identifiers),
-                                  std::move(request));
-    }
-    case kStopReportingSessionForID:
-      return object_->stopReportingSessionForID(reporterIDOf(arguments[0]), std::move(request));
-    case kDestroyReportingSession:
-      return object_->destroyReportingSession(reporterIDOf(arguments[0]), std::move(request));
-    case kReporterIDValid:
-      return object_->reporterIDValid(reporterIDOf(arguments[0]), std::move(request));
-    case kGetAllReporters:
-      return object_->getAllReporters(std::move(request));
-    case kKillService:
-      return object_->killService();
-    case kObserve:
-      return object_->observe(std::move(request));
-    default:
-      return;
-  }
+  if (const std::optional<ReplyError> error = takeRole(requests::all().methods[method])) return reply(error);
+  Incoming incoming{std::move(arguments), std::move(reply), std::move(token)};
+  handlers()[method]->run({*object_, *watch_}, incoming);
 }
 
 }  // namespace tonewerk

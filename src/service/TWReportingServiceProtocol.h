@@ -2,18 +2,13 @@
 #pragma once
 
 #include <optional>
-#include <string_view>
 #include <vector>
 
+#include "platform/RequestHandler.h"
 #include "protocol/AudioEvent.h"
-#include "protocol/RequestSet.h"
 #include "values/Value.h"
 
 namespace tonewerk {
-
-// Keys of the validity answer.
-inline constexpr std::string_view TWReporterProxyKeyReporterID = "reporterID";
-inline constexpr std::string_view TWReporterProxyKeyServiceType = "serviceType";
 
 // The way back for one request, and what says that its body has run.
 struct ServiceRequest {

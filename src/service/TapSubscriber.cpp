@@ -6,6 +6,7 @@
 
 #include "platform/SerialQueue.h"
 #include "protocol/WatchKeys.h"
+#include "service/SessionListing.h"
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionMessage.h"

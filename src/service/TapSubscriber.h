@@ -6,8 +6,9 @@
 #include <deque>
 #include <memory>
 
+#include "platform/RequestHandler.h"
 #include "protocol/AudioEvent.h"
-#include "protocol/RequestSet.h"
+#include "protocol/Requests.h"
 #include "service/MessageFilter.h"
 #include "values/Value.h"
 
@@ -29,7 +30,7 @@ class TapSubscriber final : public std::enable_shared_from_this<TapSubscriber> {
   static constexpr std::size_t kMaxMessages = 4096;
   static constexpr std::size_t kMaxBytes = std::size_t{4} << 20;
   // What an answer may come to. A message that alone comes to more is missed.
-  static constexpr std::size_t kMaxAnswerBytes = std::size_t{512} << 10;
+  static constexpr std::size_t kMaxAnswerBytes = requests::kMaxMessagesBytes;
   // What a message comes to beside its payload, here and in an answer.
   static constexpr std::size_t kRecordBytes = 512;
   // A payload nested deeper is missed: a frame may nest 32 levels, and the answer puts four around it.

@@ -39,9 +39,9 @@
 #include "platform/linux/system/WatchdogFeeder.h"
 #include "platform/linux/tracing/Tracing.h"
 #include "platform/linux/tracing/TracingSetup.h"
+#include "protocol/Requests.h"
 #include "service/TWReportingClientServerInstance.h"
 #include "service/TWReportingService.h"
-#include "service/TWReportingServiceExport.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingUtility.h"
 #include "workers/TWReportingWorkerClasses.h"
@@ -109,8 +109,7 @@ class Daemon {
         context_(platformOf(linux, directories), allWorkerClasses()),
         service_(TWReportingService::make([this] { endOnKillRequest(); })),
         listener_(std::move(socket), log, watchdogOf(manager, linux.clock()), ::geteuid(), &linux.memory()),
-        dbusListener_(dbusNames(), TWReportingServiceExport::requestSet(), dbusAddressFromEnvironment(), log,
-                      &linux.memory()) {
+        dbusListener_(dbusNames(), requests::all(), dbusAddressFromEnvironment(), log, &linux.memory()) {
     diagnostics_.removeLeftovers();  // the socket is ours, so no other daemon writes there
     // Asked for now, so that device facts that are read again later change nothing about it.
     hasSignposts_ = context_.isInternalBuild() && isTracingBuiltIn();

@@ -11,6 +11,7 @@
 
 #include "platform/LogCategory.h"
 #include "protocol/AudioEvent.h"
+#include "protocol/EventTexts.h"
 #include "values/Value.h"
 
 namespace tonewerk {
@@ -20,21 +21,11 @@ class SerialQueue;
 // The daemon's shared vocabulary. Free functions, any thread; those that read the process's state do so
 // through TWReportingContext::current().
 
-// "Playback"; with an event domain "HAL_Playback". A domain without a text leaves its "_" standing, a base
-// without one reads "Undefined".
-std::string TWReportingUtilityCategoryString(AudioEventCategory category);
 // Exact texts of the base categories and "Unknown"; everything else, domains included, is kCategoryUnknown.
 AudioEventCategory TWReportingUtilityCategoryFromString(std::string_view text);
 
-std::string TWReportingUtilityTypeString(AudioEventType type);
 // Exact texts; "MemoryLog" is not read back. Everything else is kTypeGeneric.
 AudioEventType TWReportingUtilityTypeFromString(std::string_view text);
-
-std::string TWReportingUtilityGenerateServiceNameFromServiceType(AudioServiceType type);
-AudioServiceType TWReportingUtilityGenerateServiceTypeFromServiceName(std::string_view name);
-
-// Whether the category carries an event domain.
-bool TWReportingUtilityIsABTestModeOn(AudioEventCategory category);
 
 inline ReporterID TWReportingUtilityExtractSessionIDFromReporterID(ReporterID reporterID) {
   return reporterID;

@@ -9,7 +9,7 @@
 #include <vector>
 
 #include "platform/linux/socket/RawClient.h"
-#include "service/TWReportingServiceExport.h"
+#include "protocol/Requests.h"
 #include "system/support/DaemonTest.h"
 #include "system/support/Packed.h"
 #include "system/support/RecordedEvents.h"
@@ -51,7 +51,7 @@ class RandomFrames {
  private:
   // All but the one that ends the daemon.
   const Method& anyMethod() {
-    const std::vector<Method>& methods = TWReportingServiceExport::requestSet().methods;
+    const std::vector<Method>& methods = requests::all().methods;
     for (;;) {
       const Method& method = methods[below(methods.size())];
       if (method.result.type != ResultType::kNever) return method;

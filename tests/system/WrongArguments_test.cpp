@@ -7,7 +7,7 @@
 #include <vector>
 
 #include "platform/linux/socket/RawClient.h"
-#include "service/TWReportingServiceExport.h"
+#include "protocol/Requests.h"
 #include "system/support/DaemonTest.h"
 #include "system/support/Packed.h"
 
@@ -168,7 +168,7 @@ class WrongArgumentsTest : public RunningDaemonTest {
 
 TEST_F(WrongArgumentsTest, EveryWrongKindForEveryParameterIsRefusedByItsName) {
   std::size_t refused = 0;
-  for (const Method& method : TWReportingServiceExport::requestSet().methods) {
+  for (const Method& method : requests::all().methods) {
     for (std::size_t at = 0; at < method.parameters.size(); ++at) {
       for (const auto& [what, bytes] : wrongFor(method.parameters[at].type)) {
         SCOPED_TRACE(std::string(method.name) + ", " + std::string(method.parameters[at].name) + ": " + what);
@@ -184,7 +184,7 @@ TEST_F(WrongArgumentsTest, EveryWrongKindForEveryParameterIsRefusedByItsName) {
 }
 
 TEST_F(WrongArgumentsTest, TooFewAndTooManyArgumentsAreRefused) {
-  for (const Method& method : TWReportingServiceExport::requestSet().methods) {
+  for (const Method& method : requests::all().methods) {
     const std::vector<std::string> right = rightFor(method);
     for (const std::size_t count : {std::size_t{0}, right.size() - 1, right.size() + 1, std::size_t{40}}) {
       if (count == right.size() || count > 40) continue;

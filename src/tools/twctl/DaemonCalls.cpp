@@ -7,6 +7,8 @@
 #include <system_error>
 #include <vector>
 
+#include "protocol/Requests.h"
+
 namespace tonewerk {
 namespace {
 
@@ -25,7 +27,7 @@ bool DaemonCalls::connect(Role role) {
   if (!error) {
     // A daemon too old to know the request says so, and works as without it; one that is gone shows with the
     // next request.
-    if (role == Role::kOnlooker) static_cast<void>(client_.request("observe", {}, {}));
+    if (role == Role::kOnlooker) static_cast<void>(client_.request(requests::kObserve.name, {}, {}));
     return true;
   }
   std::string tried;

@@ -16,7 +16,7 @@
 #include "platform/LogCategory.h"
 #include "platform/linux/socket/ServerSocket.h"
 #include "platform/linux/socket/UnixSocketListener.h"
-#include "service/TWReportingServiceExport.h"
+#include "protocol/Requests.h"
 #include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
@@ -66,8 +66,7 @@ class ScriptedDaemon {
     explicit Object(ScriptedDaemon& daemon) : daemon_(daemon) {}
     void handleRequest(std::size_t method, Arguments arguments, Reply reply,
                        InFlightToken /*token*/) override {
-      daemon_.handle(std::string(TWReportingServiceExport::requestSet().methods[method].name),
-                     std::move(arguments), reply);
+      daemon_.handle(std::string(requests::all().methods[method].name), std::move(arguments), reply);
     }
 
    private:
@@ -78,7 +77,7 @@ class ScriptedDaemon {
    public:
     explicit Delegate(ScriptedDaemon& daemon) : daemon_(daemon) {}
     bool listenerShouldAcceptNewConnection(MessagingConnection& connection) override {
-      connection.exportObject(TWReportingServiceExport::requestSet(), std::make_shared<Object>(daemon_));
+      connection.exportObject(requests::all(), std::make_shared<Object>(daemon_));
       connection.resume();
       return true;
     }

@@ -9,9 +9,9 @@
 #include <mutex>
 #include <optional>
 
+#include "platform/RequestHandler.h"
 #include "platform/linux/threads/BatchScope.h"
 #include "platform/linux/threads/IoWaker.h"
-#include "protocol/RequestSet.h"
 
 namespace tonewerk {
 

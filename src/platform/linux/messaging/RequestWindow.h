@@ -7,8 +7,8 @@
 #include <limits>
 #include <memory>
 
+#include "platform/RequestHandler.h"
 #include "platform/linux/threads/IoWaker.h"
-#include "protocol/RequestSet.h"
 
 namespace tonewerk {
 

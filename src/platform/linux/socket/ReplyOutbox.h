@@ -8,9 +8,9 @@
 #include <mutex>
 #include <string>
 
+#include "platform/RequestHandler.h"
 #include "platform/linux/threads/BatchScope.h"
 #include "platform/linux/threads/IoWaker.h"
-#include "protocol/RequestSet.h"
 
 namespace tonewerk {
 

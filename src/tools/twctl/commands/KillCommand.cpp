@@ -3,6 +3,7 @@
 #include <chrono>
 #include <system_error>
 
+#include "protocol/Requests.h"
 #include "tools/twctl/DaemonCalls.h"
 #include "tools/twctl/commands/Commands.h"
 
@@ -16,9 +17,9 @@ void kill(Tool& tool) {
   DaemonCalls daemon(tool);
   if (!daemon.connect(DaemonCalls::Role::kClient)) return;
   std::error_code error;
-  const auto answer = daemon.client().call("killService", {}, kEndTimeout, error);
+  const auto answer = daemon.client().call(requests::kKillService.name, {}, kEndTimeout, error);
   if (answer && answer->error) {
-    tool.status = tool.fail(kRefused, DaemonCalls::describe("killService", *answer->error));
+    tool.status = tool.fail(kRefused, DaemonCalls::describe(requests::kKillService.name, *answer->error));
   } else if (error == std::errc::timed_out) {
     tool.status = tool.fail(kNoDaemon, "the daemon has not ended");
   }

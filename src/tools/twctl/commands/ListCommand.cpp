@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <CLI/CLI.hpp>
 
+#include "protocol/Requests.h"
 #include "tools/twctl/DaemonCalls.h"
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/commands/SessionLookup.h"
@@ -12,7 +13,9 @@ namespace {
 void list(Tool& tool) {
   DaemonCalls daemon(tool);
   std::optional<Value> reporters;
-  if (!daemon.connect(DaemonCalls::Role::kOnlooker) || !daemon.call("getAllReporters", {}, reporters)) return;
+  if (!daemon.connect(DaemonCalls::Role::kOnlooker) ||
+      !daemon.call(requests::kGetAllReporters.name, {}, reporters))
+    return;
   SessionTable table(tool);
   const ValueArray* identifiers = reporters ? reporters->asArray() : nullptr;
   if (identifiers == nullptr) return;

@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <utility>
 
+#include "protocol/Requests.h"
 #include "tools/twctl/DaemonCalls.h"
 
 namespace tonewerk {
@@ -60,8 +61,8 @@ std::error_code RecordingPlayer::waitForAnswers() {
 }
 
 std::error_code RecordingPlayer::send(const RecordedCall& call) {
-  const bool isStart = call.method == "startReportingSessionForID";
-  const bool isKill = call.method == "killService";
+  const bool isStart = call.method == requests::kStartReportingSessionForID.name;
+  const bool isKill = call.method == requests::kKillService.name;
   endsDaemon_ = endsDaemon_ || isKill;
   const auto answered = [this, &call, isStart](const DaemonConnection::Answer& answer) {
     if (!isStart) --unanswered_;

@@ -8,7 +8,7 @@
 #include <string>
 #include <system_error>
 
-#include "service/TWReportingServiceExport.h"
+#include "protocol/Requests.h"
 #include "tools/twctl/DaemonCalls.h"
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/commands/RecordingPlayer.h"
@@ -38,7 +38,7 @@ std::optional<Recording> readRecording(Tool& tool, const std::string& file) {
   errno = 0;
   std::ifstream text(file);
   std::optional<Recording> recording;
-  if (text) recording = Recording::read(text, TWReportingServiceExport::requestSet(), tool.json, problem);
+  if (text) recording = Recording::read(text, requests::all(), tool.json, problem);
   // A directory opens, and fails to be read.
   if (!text.is_open() || text.bad()) {
     const int reason = errno != 0 ? errno : EIO;

@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "platform/JsonService.h"
+#include "protocol/Requests.h"
 #include "tools/twctl/DaemonCalls.h"
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/commands/SessionLookup.h"
@@ -78,8 +79,8 @@ void send(Tool& tool, const SendOptions& options) {
   Argument recipients;
   if (!options.reporterIDs.empty())
     recipients = ValueArray(std::vector<Value>(options.reporterIDs.begin(), options.reporterIDs.end()));
-  daemon.call("sendMessage", {Value(std::move(*payload)), Value(*category), Value(*type), recipients},
-              result);
+  daemon.call(requests::kSendMessage.name,
+              {Value(std::move(*payload)), Value(*category), Value(*type), recipients}, result);
 }
 
 }  // namespace

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "tools/twctl/commands/SessionLookup.h"
 
-#include "service/TWReportingServiceProtocol.h"
+#include "protocol/Requests.h"
 #include "tools/twctl/DaemonCalls.h"
 
 namespace tonewerk {
@@ -9,7 +9,7 @@ namespace tonewerk {
 bool lookUpSession(DaemonCalls& daemon, ReporterID reporterID, std::optional<AudioServiceType>& serviceType) {
   serviceType.reset();
   std::optional<Value> validity;
-  if (!daemon.call("reporterIDValid", {Value(reporterID)}, validity)) return false;
+  if (!daemon.call(requests::kReporterIDValid.name, {Value(reporterID)}, validity)) return false;
   const ValueMap* session = validity ? validity->asMap() : nullptr;
   if (session != nullptr && session->integer(TWReporterProxyKeyReporterID) == reporterID)
     serviceType = static_cast<AudioServiceType>(session->integer(TWReporterProxyKeyServiceType));

@@ -8,6 +8,7 @@
 #include <string>
 #include <vector>
 
+#include "protocol/Requests.h"
 #include "protocol/WatchKeys.h"
 #include "tools/twctl/DaemonCalls.h"
 #include "tools/twctl/commands/Commands.h"
@@ -83,9 +84,10 @@ void tail(Tool& tool, const TailOptions& options) {
     return event == LiveEvents::Event::kReadable;
   };
   std::optional<DaemonFailure> failure;
-  std::optional<Value> answer = daemon.await("watch.openMessages", *filter, waitReadable, failure);
+  std::optional<Value> answer =
+      daemon.await(requests::kWatchOpenMessages.name, *filter, waitReadable, failure);
   for (std::int64_t left = options.count; answer && left > 0 && tool.out;) {
-    answer = daemon.await("watch.nextMessages", {}, waitReadable, failure);
+    answer = daemon.await(requests::kWatchNextMessages.name, {}, waitReadable, failure);
     if (answer && answer->asMap() != nullptr) print(tool, *answer->asMap(), left);
   }
   if (failure) tool.status = tool.fail(failure->status, failure->problem);

@@ -8,6 +8,7 @@
 #include <thread>
 #include <utility>
 
+#include "protocol/Requests.h"
 #include "protocol/WatchKeys.h"
 #include "tools/twctl/DaemonCalls.h"
 #include "tools/twctl/commands/Commands.h"
@@ -101,7 +102,7 @@ void printFrame(const Tool& tool, const std::vector<SessionRow>& rows) {
 void printOneFrame(const Tool& tool, DaemonCalls& daemon, double interval) {
   const auto ask = [&daemon](const Arguments& arguments) -> std::optional<Value> {
     std::optional<Value> result;
-    return daemon.call("watch.sessions", arguments, result) ? result : std::nullopt;
+    return daemon.call(requests::kWatchSessions.name, arguments, result) ? result : std::nullopt;
   };
   SessionRates rates;
   const auto first = listSessions(ask);
@@ -118,8 +119,8 @@ void showOnTerminal(Tool& tool, DaemonCalls& daemon, double interval) {
     TerminalScreen screen(tool);
     const auto ask = [&](const Arguments& arguments) {
       return daemon.await(
-          "watch.sessions", arguments, [&screen](int descriptor) { return screen.waitReadable(descriptor); },
-          failure);
+          requests::kWatchSessions.name, arguments,
+          [&screen](int descriptor) { return screen.waitReadable(descriptor); }, failure);
     };
     runTop([&ask] { return listSessions(ask); }, screen, interval);
   }

@@ -7,7 +7,7 @@
 #include <utility>
 #include <vector>
 
-#include "session/TWReportingUtility.h"
+#include "protocol/EventTexts.h"
 #include "tools/twctl/input/Suggestion.h"
 
 namespace tonewerk {

@@ -4,8 +4,8 @@
 #include <ostream>
 #include <string>
 
+#include "protocol/EventTexts.h"
 #include "protocol/WatchKeys.h"
-#include "session/TWReportingUtility.h"
 #include "tools/twctl/Tool.h"
 #include "tools/twctl/show/PrintableText.h"
 

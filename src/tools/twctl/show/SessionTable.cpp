@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "tools/twctl/show/SessionTable.h"
 
-#include "session/TWReportingUtility.h"
+#include "protocol/EventTexts.h"
 
 namespace tonewerk {
 

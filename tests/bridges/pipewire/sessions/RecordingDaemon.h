@@ -13,7 +13,7 @@
 
 #include "platform/LogCategory.h"
 #include "platform/linux/socket/UnixSocketListener.h"
-#include "service/TWReportingServiceExport.h"
+#include "protocol/Requests.h"
 #include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
@@ -75,7 +75,7 @@ class RecordingDaemon final : private MessagingListenerDelegate {
     RecordingDaemon& daemon_;
   };
 
-  static const RequestSet& interface() { return TWReportingServiceExport::requestSet(); }
+  static const RequestSet& interface() { return requests::all(); }
 
   bool listenerShouldAcceptNewConnection(MessagingConnection& connection) override {
     connection.exportObject(interface(), std::make_shared<Object>(*this));

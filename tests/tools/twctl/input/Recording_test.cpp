@@ -5,7 +5,7 @@
 #include <sstream>
 #include <string>
 
-#include "service/TWReportingServiceExport.h"
+#include "protocol/Requests.h"
 #include "support/memory/MemoryJsonService.h"
 
 namespace tonewerk {
@@ -20,7 +20,7 @@ class RecordingTest : public testing::Test {
  protected:
   std::optional<Recording> read(const std::string& text) {
     std::istringstream stream(text);
-    return Recording::read(stream, TWReportingServiceExport::requestSet(), json_, problem_);
+    return Recording::read(stream, requests::all(), json_, problem_);
   }
   std::string problemOf(const std::string& text) {
     problem_.clear();

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "service/WatchExport.h"
+#include "service/WatchRequests.h"
 
 #include <numeric>
 #include <string>
@@ -20,7 +20,7 @@ using ::testing::SizeIs;
 constexpr std::uint32_t kOther = MemoryMessaging::kOwner + 1;
 const Arguments kNoFilter{std::nullopt, std::nullopt, std::nullopt};
 
-class WatchExportTest : public ServiceTest {
+class WatchRequestsTest : public ServiceTest {
  protected:
   void send(MemoryClient& client, ValueMap message, const std::vector<ReporterID>& reporterIDs,
             AudioEventCategory category = 4, AudioEventType type = 1) {
@@ -65,7 +65,7 @@ class WatchExportTest : public ServiceTest {
 
 // Who may ask.
 
-TEST_F(WatchExportTest, IsForTheDaemonsOwnUserAndRoot) {
+TEST_F(WatchRequestsTest, IsForTheDaemonsOwnUserAndRoot) {
   const std::vector<std::pair<std::string, Arguments>> requests{
       {"watch.sessions", {0}}, {"watch.openMessages", kNoFilter}, {"watch.nextMessages", {}}};
   for (const auto& [method, arguments] : requests) {
@@ -83,7 +83,7 @@ TEST_F(WatchExportTest, IsForTheDaemonsOwnUserAndRoot) {
 
 // Sessions.
 
-TEST_F(WatchExportTest, SaysWhatEachSessionIsAndDoes) {
+TEST_F(WatchRequestsTest, SaysWhatEachSessionIsAndDoes) {
   test.processes.setName(11, "player");
   const auto client = connect(11);
   create(*client, 77);
@@ -103,7 +103,7 @@ TEST_F(WatchExportTest, SaysWhatEachSessionIsAndDoes) {
                 R"("seconds":12.5}]})");
 }
 
-TEST_F(WatchExportTest, ASessionThatIsNotStartedHasNoRunningTime) {
+TEST_F(WatchRequestsTest, ASessionThatIsNotStartedHasNoRunningTime) {
   const auto client = connect(11);
   create(*client, 77);
   const auto sessions = listed(*client);
@@ -113,7 +113,7 @@ TEST_F(WatchExportTest, ASessionThatIsNotStartedHasNoRunningTime) {
   EXPECT_FALSE(sessions[0].contains("processName"));
 }
 
-TEST_F(WatchExportTest, CountsAnewAfterAStop) {
+TEST_F(WatchRequestsTest, CountsAnewAfterAStop) {
   const auto client = connect(11);
   start(*client, 77);
   send(*client, {{"a", 1}}, {77});
@@ -126,7 +126,7 @@ TEST_F(WatchExportTest, CountsAnewAfterAStop) {
   EXPECT_FALSE(stopped[0].contains("seconds"));
 }
 
-TEST_F(WatchExportTest, ListsAllClientsSessionsAndTheSingleMessageSessionLast) {
+TEST_F(WatchRequestsTest, ListsAllClientsSessionsAndTheSingleMessageSessionLast) {
   const auto first = connect(11);
   const auto second = connect(12);
   create(*second, 5);
@@ -140,7 +140,7 @@ TEST_F(WatchExportTest, ListsAllClientsSessionsAndTheSingleMessageSessionLast) {
   EXPECT_EQ(sessions.back().integer("processIdentifier"), test.processes.ownProcessIdentifier());
 }
 
-TEST_F(WatchExportTest, ListsManySessionsInPortions) {
+TEST_F(WatchRequestsTest, ListsManySessionsInPortions) {
   const auto first = connect(11);
   const auto second = connect(12);
   const auto most = static_cast<ReporterID>(kMaxListedSessions);
@@ -158,7 +158,7 @@ TEST_F(WatchExportTest, ListsManySessionsInPortions) {
   EXPECT_THAT(listed(*first, -1), SizeIs(kMaxListedSessions));
 }
 
-TEST_F(WatchExportTest, APortionOfTheLongestNamesFitsIntoItsBound) {
+TEST_F(WatchRequestsTest, APortionOfTheLongestNamesFitsIntoItsBound) {
   const auto client = connect(11);
   test.processes.setName(12, std::string(300, 'n'));
   const auto longNamed = connect(12);
@@ -171,12 +171,12 @@ TEST_F(WatchExportTest, APortionOfTheLongestNamesFitsIntoItsBound) {
   ASSERT_THAT(sessions, SizeIs(10));
   EXPECT_EQ(sessions[0].text("application").size(), 256U);
   EXPECT_EQ(sessions[0].text("processName").size(), 256U);
-  EXPECT_LE(sessions[0].bytes() * kMaxListedSessions, kMaxSessionListingBytes);
+  EXPECT_LE(sessions[0].bytes() * kMaxListedSessions, requests::kMaxSessionListingBytes);
 }
 
 // Messages.
 
-TEST_F(WatchExportTest, ShowsMessagesOfEveryClientAsTheyWereStored) {
+TEST_F(WatchRequestsTest, ShowsMessagesOfEveryClientAsTheyWereStored) {
   const auto client = connect(11);
   start(*client, 77);
   const auto watcher = connect(12);
@@ -192,7 +192,7 @@ TEST_F(WatchExportTest, ShowsMessagesOfEveryClientAsTheyWereStored) {
   EXPECT_EQ(*messages[0].find("payload")->asMap(), sessionOf(0, 77)->messages().back()->message);
 }
 
-TEST_F(WatchExportTest, MarksRedundantMessages) {
+TEST_F(WatchRequestsTest, MarksRedundantMessages) {
   const auto client = connect(11);
   start(*client, 77);
   open(*client);
@@ -204,7 +204,7 @@ TEST_F(WatchExportTest, MarksRedundantMessages) {
   EXPECT_TRUE(messages[1].boolean("redundant"));
 }
 
-TEST_F(WatchExportTest, ShowsAMessageOnceForEachSessionItGoesTo) {
+TEST_F(WatchRequestsTest, ShowsAMessageOnceForEachSessionItGoesTo) {
   const auto client = connect(11);
   start(*client, 77);
   start(*client, 78);
@@ -213,7 +213,7 @@ TEST_F(WatchExportTest, ShowsAMessageOnceForEachSessionItGoesTo) {
   EXPECT_THAT(sessionsOf(nextMessages(*client)), ElementsAre(77, 78));
 }
 
-TEST_F(WatchExportTest, ShowsMessagesOfTheSingleMessageSession) {
+TEST_F(WatchRequestsTest, ShowsMessagesOfTheSingleMessageSession) {
   const auto client = connect(11);
   open(*client);
   send(*client, {{"a", 1}}, {});
@@ -222,7 +222,7 @@ TEST_F(WatchExportTest, ShowsMessagesOfTheSingleMessageSession) {
   EXPECT_EQ(messages.at(0).integer("serviceType"), kServiceStandalone);
 }
 
-TEST_F(WatchExportTest, FiltersInTheDaemon) {
+TEST_F(WatchRequestsTest, FiltersInTheDaemon) {
   const auto client = connect(11);
   start(*client, 77);
   start(*client, 78);
@@ -237,7 +237,7 @@ TEST_F(WatchExportTest, FiltersInTheDaemon) {
   EXPECT_EQ(messages[1].find("payload")->asMap()->integer("a"), 4);
 }
 
-TEST_F(WatchExportTest, AHeldRequestIsAnsweredByTheNextMessage) {
+TEST_F(WatchRequestsTest, AHeldRequestIsAnsweredByTheNextMessage) {
   const auto client = connect(11);
   start(*client, 77);
   const auto watcher = connect(12);
@@ -249,7 +249,7 @@ TEST_F(WatchExportTest, AHeldRequestIsAnsweredByTheNextMessage) {
   EXPECT_EQ(watcher->unfinishedRequests(), 0U);
 }
 
-TEST_F(WatchExportTest, AWatcherGoesWithItsConnection) {
+TEST_F(WatchRequestsTest, AWatcherGoesWithItsConnection) {
   const auto client = connect(11);
   start(*client, 77);
   const auto watcher = connect(12);
@@ -265,7 +265,7 @@ TEST_F(WatchExportTest, AWatcherGoesWithItsConnection) {
   EXPECT_THAT(nextMessages(*watcher), SizeIs(1));
 }
 
-TEST_F(WatchExportTest, OpeningAgainShowsEachMessageOnce) {
+TEST_F(WatchRequestsTest, OpeningAgainShowsEachMessageOnce) {
   const auto client = connect(11);
   start(*client, 77);
   open(*client);
@@ -274,13 +274,13 @@ TEST_F(WatchExportTest, OpeningAgainShowsEachMessageOnce) {
   EXPECT_THAT(nextMessages(*client), SizeIs(1));
 }
 
-TEST_F(WatchExportTest, WantsToBeOpenedFirst) {
+TEST_F(WatchRequestsTest, WantsToBeOpenedFirst) {
   const auto client = connect(11);
   EXPECT_EQ(refusalOf(*client, "watch.nextMessages", {}),
             messagingError(2, "watch.nextMessages: watch.openMessages comes first"));
 }
 
-TEST_F(WatchExportTest, AFilterHasSoManyEntriesAndNoMore) {
+TEST_F(WatchRequestsTest, AFilterHasSoManyEntriesAndNoMore) {
   const auto client = connect(11);
   std::vector<Value> numbers(MessageFilter::kMaxEntries - 1, Value(5));
   open(*client, {ValueArray(numbers), ValueArray{4}, std::nullopt});
@@ -288,7 +288,7 @@ TEST_F(WatchExportTest, AFilterHasSoManyEntriesAndNoMore) {
             messagingError(3, "the filter has 4097 entries, the most is 4096"));
 }
 
-TEST_F(WatchExportTest, NumbersThatAreNoCategoryFitNothing) {
+TEST_F(WatchRequestsTest, NumbersThatAreNoCategoryFitNothing) {
   const auto client = connect(11);
   start(*client, 77);
   // The low 32 bits are category 4's.
@@ -297,7 +297,7 @@ TEST_F(WatchExportTest, NumbersThatAreNoCategoryFitNothing) {
   EXPECT_THAT(ask(*client, "watch.nextMessages", {}), IsEmpty());
 }
 
-TEST_F(WatchExportTest, LogsWhoWatches) {
+TEST_F(WatchRequestsTest, LogsWhoWatches) {
   const auto client = connect(11);
   open(*client);
   EXPECT_THAT(test.log.textsOf("twrs", LogLevel::kInfo), Contains("client 11 watches messages"));

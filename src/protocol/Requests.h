@@ -1,0 +1,87 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstddef>
+#include <string_view>
+
+#include "protocol/RequestSet.h"
+
+namespace tonewerk {
+
+// Keys of the validity answer.
+inline constexpr std::string_view TWReporterProxyKeyReporterID = "reporterID";
+inline constexpr std::string_view TWReporterProxyKeyServiceType = "serviceType";
+
+// Every request that the daemon understands, described once: clients name requests by these, front ends check
+// arguments against them, and the service has a handler for each.
+namespace requests {
+
+// The most bytes that the answers of variable size may have. A list of reporter identifiers: about ten
+// clients with as many sessions as they may have.
+inline constexpr std::size_t kMaxReportersBytes = std::size_t{512} << 10;
+inline constexpr std::size_t kMaxSessionListingBytes = std::size_t{512} << 10;
+inline constexpr std::size_t kMaxMessagesBytes = std::size_t{512} << 10;
+
+inline constexpr Parameter kReporterID{"reporterID", ParameterType::kInt64};
+inline constexpr Result kSuccess{ResultType::kBoolean, "success"};
+
+inline constexpr Method kCreateReportingSession{
+    .name = "createReportingSession", .parameters = {kReporterID}, .result = kSuccess, .changesState = true};
+inline constexpr Method kSetServiceType{.name = "setServiceType",
+                                        .parameters = {{"serviceType", ParameterType::kUInt16}, kReporterID},
+                                        .result = kSuccess,
+                                        .changesState = true};
+inline constexpr Method kGetServiceNameForReporterID{.name = "getServiceNameForReporterID",
+                                                     .parameters = {kReporterID},
+                                                     .result = {ResultType::kUInt16, "serviceType"}};
+inline constexpr Method kSetConfiguration{.name = "setConfiguration",
+                                          .parameters = {{"configuration", ParameterType::kMap}, kReporterID},
+                                          .result = kSuccess,
+                                          .changesState = true};
+inline constexpr Method kStartReportingSessionForID{.name = "startReportingSessionForID",
+                                                    .parameters = {kReporterID},
+                                                    .result = kSuccess,
+                                                    .changesState = true};
+inline constexpr Method kSendMessage{.name = "sendMessage",
+                                     .parameters = {{"message", ParameterType::kMap},
+                                                    {"category", ParameterType::kUInt32},
+                                                    {"type", ParameterType::kUInt16},
+                                                    {"reporterIDs", ParameterType::kInt64ListOrNone}},
+                                     .changesState = true};
+inline constexpr Method kStopReportingSessionForID{.name = "stopReportingSessionForID",
+                                                   .parameters = {kReporterID},
+                                                   .result = kSuccess,
+                                                   .changesState = true};
+inline constexpr Method kDestroyReportingSession{
+    .name = "destroyReportingSession", .parameters = {kReporterID}, .result = kSuccess, .changesState = true};
+inline constexpr Method kReporterIDValid{
+    .name = "reporterIDValid", .parameters = {kReporterID}, .result = {ResultType::kMap, "validity"}};
+inline constexpr Method kGetAllReporters{.name = "getAllReporters",
+                                         .result = {ResultType::kInt64List, "reporterIDs"},
+                                         .replyBytes = kMaxReportersBytes};
+inline constexpr Method kKillService{
+    .name = "killService", .result = {ResultType::kNever, ""}, .changesState = true};
+inline constexpr Method kObserve{.name = "observe", .result = kSuccess};
+
+// What the daemon does now, for its own user and root.
+inline constexpr Method kWatchSessions{.name = "watch.sessions",
+                                       .parameters = {{"first", ParameterType::kInt64}},
+                                       .result = {ResultType::kAny, "sessions"},
+                                       .replyBytes = kMaxSessionListingBytes,
+                                       .forOwner = true};
+inline constexpr Method kWatchOpenMessages{.name = "watch.openMessages",
+                                           .parameters = {{"reporterIDs", ParameterType::kInt64ListOrNone},
+                                                          {"categories", ParameterType::kInt64ListOrNone},
+                                                          {"types", ParameterType::kInt64ListOrNone}},
+                                           .result = {ResultType::kAny, "answer"},
+                                           .forOwner = true};
+inline constexpr Method kWatchNextMessages{.name = "watch.nextMessages",
+                                           .result = {ResultType::kAny, "messages"},
+                                           .replyBytes = kMaxMessagesBytes,
+                                           .forOwner = true};
+
+// All of them, in the order in which they are listed to people.
+const RequestSet& all();
+
+}  // namespace requests
+}  // namespace tonewerk

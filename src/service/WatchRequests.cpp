@@ -1,0 +1,86 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "service/WatchRequests.h"
+
+#include <algorithm>
+#include <optional>
+#include <string>
+#include <utility>
+
+#include "platform/LogLine.h"
+#include "platform/SerialQueue.h"
+#include "service/MessageTap.h"
+#include "service/SessionListing.h"
+#include "service/TWReportingServiceDelegateProtocol.h"
+#include "service/TapSubscriber.h"
+#include "session/TWReportingUtility.h"
+#include "values/Value.h"
+
+namespace tonewerk {
+namespace {
+
+MessageFilter::Numbers numbersOf(const Argument& list) {
+  MessageFilter::Numbers numbers;
+  if (!list) return numbers;
+  for (const Value& number : *list->asArray()) numbers.push_back(number.integer());
+  std::sort(numbers.begin(), numbers.end());
+  return numbers;
+}
+
+std::size_t placeOf(const Argument& number) {
+  return static_cast<std::size_t>(std::max<std::int64_t>(number->integer(), 0));
+}
+
+ReplyError tooManyEntries(std::size_t count) {
+  return messagingError(kOverLimit, "the filter has " + std::to_string(count) + " entries, the most is " +
+                                        std::to_string(MessageFilter::kMaxEntries));
+}
+
+}  // namespace
+
+WatchRequests::WatchRequests(std::int32_t processIdentifier,
+                             std::weak_ptr<TWReportingServiceDelegateProtocol> service)
+    : processIdentifier_(processIdentifier),
+      service_(std::move(service)),
+      subscriber_(std::make_shared<TapSubscriber>()) {}
+
+template <class Body>
+void WatchRequests::onWorkQueue(Body body, Reply reply, InFlightToken token) {
+  TWReportingUtilityGetReportingServerQueue().async([service = service_, body = std::move(body),
+                                                     reply = std::move(reply),
+                                                     token = std::move(token)]() mutable {
+    if (const auto living = service.lock()) body(*living, reply, token);
+  });
+}
+
+void WatchRequests::sessions(const Arguments& arguments, Reply reply, InFlightToken token) {
+  onWorkQueue(
+      [first = placeOf(arguments[0])](auto& service, const Reply& answer, InFlightToken&) {
+        answer(std::nullopt, sessionListing(service, first));
+      },
+      std::move(reply), std::move(token));
+}
+
+void WatchRequests::openMessages(const Arguments& arguments, Reply reply, InFlightToken token) {
+  MessageFilter filter{numbersOf(arguments[0]), numbersOf(arguments[1]), numbersOf(arguments[2])};
+  if (filter.size() > MessageFilter::kMaxEntries) return reply(tooManyEntries(filter.size()));
+  onWorkQueue(
+      [subscriber = subscriber_, filter = std::move(filter), client = processIdentifier_](
+          auto& service, const Reply& answer, InFlightToken&) mutable {
+        infoLog(TWReportingServiceDelegateCategory(), "client %i watches messages", client);
+        subscriber->open(std::move(filter));
+        service.messageTap().add(subscriber);
+        answer(std::nullopt, true);
+      },
+      std::move(reply), std::move(token));
+}
+
+void WatchRequests::nextMessages(Reply reply, InFlightToken token) {
+  onWorkQueue(
+      [subscriber = subscriber_](auto&, const Reply& answer, InFlightToken& held) {
+        if (subscriber->isOpen()) return subscriber->next(answer, std::move(held));
+        answer(messagingError(kInvalidArguments, "watch.nextMessages: watch.openMessages comes first"));
+      },
+      std::move(reply), std::move(token));
+}
+
+}  // namespace tonewerk
