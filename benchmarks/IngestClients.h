@@ -8,7 +8,7 @@
 #include <vector>
 
 #include "IngestMessages.h"
-#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
 
 namespace tonewerk {
 

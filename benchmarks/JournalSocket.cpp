@@ -11,8 +11,8 @@
 #include <system_error>
 #include <unistd.h>
 
-#include "platform/linux/files/FileDescriptor.h"
-#include "platform/linux/socket/UnixAddress.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
+#include "platform/linux/descriptors/UnixAddress.h"
 
 namespace tonewerk {
 namespace {

@@ -11,7 +11,7 @@
 #include <unistd.h>
 #include <vector>
 
-#include "platform/linux/socket/UnixAddress.h"
+#include "platform/linux/descriptors/UnixAddress.h"
 
 namespace tonewerk {
 namespace {

@@ -22,7 +22,7 @@
 #include "platform/LogCategory.h"
 #include "platform/linux/LinuxPlatform.h"
 #include "platform/linux/channels/LinuxChanmeter.h"
-#include "platform/linux/files/Directories.h"
+#include "platform/linux/directories/Directories.h"
 #include "platform/linux/tracing/UnavailableTracing.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingSession.h"

@@ -19,8 +19,8 @@
 #include <unordered_map>
 #include <vector>
 
-#include "platform/linux/files/Epoll.h"
-#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/descriptors/Epoll.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
 
 namespace tonewerk {
 namespace {

@@ -19,8 +19,8 @@
 #include "Latencies.h"
 #include "SocketDrain.h"
 #include "client/MessageFrame.h"
-#include "platform/linux/files/FileDescriptor.h"
-#include "platform/linux/socket/UnixAddress.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
+#include "platform/linux/descriptors/UnixAddress.h"
 #include "support/TemporaryDirectory.h"
 #include "tonewerk/reporting.h"
 

@@ -11,7 +11,7 @@
 #include "platform/chanmeter/ChanmeterDifference.h"
 #include "platform/chanmeter/ChanmeterRecordSample.h"
 #include "platform/linux/channels/ChannelFile.h"
-#include "platform/linux/files/Utf8.h"
+#include "values/Utf8.h"
 
 namespace tonewerk {
 namespace {

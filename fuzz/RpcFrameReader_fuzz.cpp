@@ -10,11 +10,11 @@
 #include <string>
 #include <string_view>
 
-#include "platform/linux/files/Utf8.h"
 #include "platform/linux/messagepack/RpcFrameReader.h"
 #include "platform/linux/messagepack/RpcLimits.h"
 #include "platform/linux/messagepack/RpcWriter.h"
 #include "protocol/RequestSet.h"
+#include "values/Utf8.h"
 
 namespace tonewerk {
 namespace {

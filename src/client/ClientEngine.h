@@ -19,8 +19,8 @@
 #include "client/ClientSocket.h"
 #include "client/ClientThread.h"
 #include "client/Deliveries.h"
+#include "platform/linux/descriptors/WakeEvent.h"
 #include "platform/linux/messagepack/RpcFrameReader.h"
-#include "platform/linux/threads/WakeEvent.h"
 #include "tonewerk/reporting.h"
 
 namespace tonewerk {

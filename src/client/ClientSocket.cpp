@@ -6,7 +6,7 @@
 #include <sys/socket.h>
 #include <sys/time.h>
 
-#include "platform/linux/socket/UnixAddress.h"
+#include "platform/linux/descriptors/UnixAddress.h"
 
 namespace tonewerk {
 namespace {

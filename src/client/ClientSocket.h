@@ -5,7 +5,7 @@
 #include <string>
 #include <string_view>
 
-#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
 
 namespace tonewerk {
 

@@ -7,9 +7,9 @@
 #include <string_view>
 
 #include "client/PayloadFlags.h"
-#include "platform/linux/files/Utf8.h"
 #include "platform/linux/messagepack/RpcPacker.h"
 #include "tonewerk/reporting.h"
+#include "values/Utf8.h"
 
 namespace tonewerk {
 namespace {

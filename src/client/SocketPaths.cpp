@@ -5,7 +5,7 @@
 #include <optional>
 #include <unistd.h>
 
-#include "platform/linux/files/Directories.h"
+#include "platform/linux/directories/Directories.h"
 
 namespace tonewerk {
 namespace {

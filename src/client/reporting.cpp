@@ -20,9 +20,9 @@
 #include "client/PayloadFlags.h"
 #include "client/RequestBody.h"
 #include "client/SocketPaths.h"
-#include "platform/linux/files/Utf8.h"
 #include "platform/linux/messagepack/RpcLimits.h"
 #include "protocol/Requests.h"
+#include "values/Utf8.h"
 
 namespace tonewerk {
 namespace {

@@ -24,7 +24,7 @@
 #include "platform/linux/dbus/DbusListener.h"
 #include "platform/linux/diagnostics/DiagnosticsStore.h"
 #include "platform/linux/diagnostics/LinuxCapsa.h"
-#include "platform/linux/files/Directories.h"
+#include "platform/linux/directories/Directories.h"
 #include "platform/linux/messaging/AllocatorReclaimer.h"
 #include "platform/linux/notifications/DirectoryWatcher.h"
 #include "platform/linux/otlp/CurlHttpClient.h"

@@ -12,12 +12,12 @@
 #include <unistd.h>
 #include <vector>
 
-#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
+#include "platform/linux/descriptors/UnixAddress.h"
 #include "platform/linux/messagepack/RpcLimits.h"
 #include "platform/linux/messagepack/RpcWriter.h"
 #include "platform/linux/messaging/MessagingRig.h"
 #include "platform/linux/protobuf/Hex.h"
-#include "platform/linux/socket/UnixAddress.h"
 #include "platform/linux/socket/UnixSocketListener.h"
 #include "support/TemporaryDirectory.h"
 #include "support/memory/MemoryLog.h"

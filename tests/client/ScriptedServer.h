@@ -16,10 +16,10 @@
 #include <utility>
 #include <vector>
 
-#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
+#include "platform/linux/descriptors/UnixAddress.h"
 #include "platform/linux/messagepack/RpcFrameReader.h"
 #include "platform/linux/messagepack/RpcWriter.h"
-#include "platform/linux/socket/UnixAddress.h"
 
 namespace tonewerk {
 

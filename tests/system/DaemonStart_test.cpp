@@ -9,8 +9,8 @@
 #include <sys/stat.h>
 #include <vector>
 
-#include "platform/linux/files/FileDescriptor.h"
-#include "platform/linux/socket/UnixAddress.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
+#include "platform/linux/descriptors/UnixAddress.h"
 #include "support/TemporaryDirectory.h"
 #include "system/support/DaemonTest.h"
 

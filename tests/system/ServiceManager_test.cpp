@@ -5,7 +5,7 @@
 #include <string>
 #include <sys/stat.h>
 
-#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
 #include "support/NotifySocket.h"
 #include "system/support/DaemonTest.h"
 

@@ -7,7 +7,7 @@
 #include <vector>
 
 #include "bridges/pipewire/EventLoop.h"
-#include "platform/linux/threads/WakeEvent.h"
+#include "platform/linux/descriptors/WakeEvent.h"
 
 namespace tonewerk {
 

@@ -12,7 +12,7 @@
 #include "platform/linux/diagnostics/LinuxIssueDraftService.h"
 #include "platform/linux/diagnostics/LinuxWhirlcapRequest.h"
 #include "platform/linux/diagnostics/collectors/StandardCollectors.h"
-#include "platform/linux/files/Directories.h"
+#include "platform/linux/directories/Directories.h"
 #include "platform/linux/files/LinuxFileSystem.h"
 #include "platform/linux/json/JsonBenchfile.h"
 #include "platform/linux/json/NlohmannJsonService.h"

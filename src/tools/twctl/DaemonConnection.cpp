@@ -9,8 +9,8 @@
 #include <utility>
 
 #include "client/ValuePayload.h"
+#include "platform/linux/descriptors/WakeEvent.h"
 #include "platform/linux/messagepack/RpcFrameReader.h"
-#include "platform/linux/threads/WakeEvent.h"
 #include "tonewerk/reporting.h"
 
 namespace tonewerk {

@@ -6,7 +6,7 @@
 #include <string_view>
 #include <vector>
 
-#include "platform/linux/files/Directories.h"
+#include "platform/linux/directories/Directories.h"
 
 namespace tonewerk {
 

@@ -28,8 +28,8 @@
 #include <unistd.h>
 
 #include "client/programs/traps.h"
-#include "platform/linux/files/FileDescriptor.h"
-#include "platform/linux/socket/UnixAddress.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
+#include "platform/linux/descriptors/UnixAddress.h"
 #include "tonewerk/reporting.h"
 
 namespace {

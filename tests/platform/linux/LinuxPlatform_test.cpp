@@ -11,7 +11,7 @@
 #include "platform/PreferenceStore.h"
 #include "platform/WhirlcapRequest.h"
 #include "platform/linux/diagnostics/DiagnosticsStore.h"
-#include "platform/linux/files/Directories.h"
+#include "platform/linux/directories/Directories.h"
 #include "platform/linux/tracing/UnavailableTracing.h"
 #include "support/TemporaryDirectory.h"
 #include "support/memory/MemoryDiagwire.h"

@@ -7,7 +7,7 @@
 #include <unordered_map>
 #include <utility>
 
-#include "platform/linux/files/Directories.h"
+#include "platform/linux/directories/Directories.h"
 #include "platform/linux/messagepack/RpcLimits.h"
 #include "platform/linux/messagepack/RpcWriter.h"
 #include "support/client/RpcClientSocket.h"

@@ -12,7 +12,7 @@
 #include <sys/time.h>
 #include <utility>
 
-#include "platform/linux/socket/UnixAddress.h"
+#include "platform/linux/descriptors/UnixAddress.h"
 
 namespace tonewerk {
 namespace {

@@ -7,7 +7,7 @@
 #include <string_view>
 #include <system_error>
 
-#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
 #include "platform/linux/messagepack/RpcFrame.h"
 #include "platform/linux/messagepack/RpcFrameReader.h"
 

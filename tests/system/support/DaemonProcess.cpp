@@ -7,8 +7,8 @@
 #include <signal.h>
 #include <sys/socket.h>
 
-#include "platform/linux/files/FileDescriptor.h"
-#include "platform/linux/socket/UnixAddress.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
+#include "platform/linux/descriptors/UnixAddress.h"
 
 namespace tonewerk {
 

@@ -10,9 +10,9 @@
 #include <utility>
 #include <vector>
 
-#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
+#include "platform/linux/descriptors/UnixAddress.h"
 #include "platform/linux/json/NlohmannJsonService.h"
-#include "platform/linux/socket/UnixAddress.h"
 #include "platform/linux/store/ReportStore.h"
 #include "support/TemporaryDirectory.h"
 #include "support/manual/ManualClock.h"

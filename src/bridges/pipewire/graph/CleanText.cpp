@@ -3,8 +3,8 @@
 
 #include <algorithm>
 
-#include "platform/linux/files/Utf8.h"
 #include "values/ShortenedText.h"
+#include "values/Utf8.h"
 
 namespace tonewerk {
 

@@ -10,7 +10,7 @@
 #include <unistd.h>
 #include <utility>
 
-#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
 #include "platform/linux/files/TextFile.h"
 
 namespace tonewerk {

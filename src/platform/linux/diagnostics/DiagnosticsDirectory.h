@@ -9,7 +9,7 @@
 #include <system_error>
 #include <vector>
 
-#include "platform/linux/diagnostics/DiagnosticItem.h"
+#include "platform/linux/diagnostics/collectors/DiagnosticItem.h"
 
 namespace tonewerk {
 

@@ -16,9 +16,9 @@
 #include <thread>
 #include <vector>
 
-#include "platform/linux/diagnostics/DiagnosticItem.h"
 #include "platform/linux/diagnostics/DiagnosticsDirectory.h"
 #include "platform/linux/diagnostics/collectors/CollectorRunner.h"
+#include "platform/linux/diagnostics/collectors/DiagnosticItem.h"
 
 namespace tonewerk {
 

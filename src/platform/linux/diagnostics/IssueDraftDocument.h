@@ -5,7 +5,7 @@
 #include <string>
 
 #include "platform/IssueDraftService.h"
-#include "platform/linux/diagnostics/DiagnosticItem.h"
+#include "platform/linux/diagnostics/collectors/DiagnosticItem.h"
 
 namespace tonewerk {
 

@@ -6,7 +6,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
 #include "platform/linux/files/Ownership.h"
 #include "platform/linux/files/TextFile.h"
 

@@ -7,8 +7,8 @@
 #include <unistd.h>
 #include <utility>
 
-#include "platform/linux/files/FileDescriptor.h"
-#include "platform/linux/files/Utf8.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
+#include "values/Utf8.h"
 
 namespace tonewerk {
 namespace {

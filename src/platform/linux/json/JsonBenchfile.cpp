@@ -8,10 +8,10 @@
 #include <utility>
 
 #include "platform/Clock.h"
-#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
 #include "platform/linux/files/TextFile.h"
-#include "platform/linux/files/Utf8.h"
 #include "values/CompactJson.h"
+#include "values/Utf8.h"
 #include "values/Value.h"
 
 namespace tonewerk {

@@ -5,7 +5,7 @@
 #include <string>
 #include <utility>
 
-#include "platform/linux/files/Utf8.h"
+#include "values/Utf8.h"
 
 namespace tonewerk {
 namespace {

@@ -5,9 +5,9 @@
 #include <utility>
 
 #include "platform/Clock.h"
-#include "platform/linux/files/Utf8.h"
 #include "platform/linux/log/RecentLines.h"
 #include "platform/linux/log/StreamLog.h"
+#include "values/Utf8.h"
 
 namespace tonewerk {
 

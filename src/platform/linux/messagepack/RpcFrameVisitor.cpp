@@ -6,8 +6,8 @@
 #include <optional>
 #include <utility>
 
-#include "platform/linux/files/Utf8.h"
 #include "platform/linux/messagepack/RpcTimestamp.h"
+#include "values/Utf8.h"
 
 namespace tonewerk {
 namespace {

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/messagepack/StringInterner.h"
 
-#include "platform/linux/files/Utf8.h"
+#include "values/Utf8.h"
 
 namespace tonewerk {
 

@@ -9,7 +9,7 @@
 #include <thread>
 
 #include "platform/LogCategory.h"
-#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
 
 namespace tonewerk {
 

@@ -12,7 +12,7 @@
 #include <unistd.h>
 
 #include "platform/NotificationHandlers.h"
-#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
 #include "platform/linux/files/LinuxFileSystem.h"
 #include "platform/linux/files/Ownership.h"
 #include "platform/linux/files/TextFile.h"

@@ -7,7 +7,7 @@
 
 #include "platform/Clock.h"
 #include "platform/LogLine.h"
-#include "platform/linux/files/Gzip.h"
+#include "platform/linux/otlp/Gzip.h"
 #include "platform/linux/otlp/OtlpAnswer.h"
 
 namespace tonewerk {

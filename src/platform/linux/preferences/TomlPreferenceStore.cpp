@@ -8,8 +8,8 @@
 #include <functional>
 #include <sys/file.h>
 
+#include "platform/linux/descriptors/FileDescriptor.h"
 #include "platform/linux/files/DurableFile.h"
-#include "platform/linux/files/FileDescriptor.h"
 #include "platform/linux/files/LinuxFileSystem.h"
 #include "platform/linux/files/Ownership.h"
 #include "platform/linux/files/TextFile.h"

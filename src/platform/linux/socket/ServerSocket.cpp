@@ -14,7 +14,7 @@
 #include <systemd/sd-daemon.h>
 #include <utility>
 
-#include "platform/linux/socket/UnixAddress.h"
+#include "platform/linux/descriptors/UnixAddress.h"
 #include "platform/linux/system/LinuxProcessInformation.h"
 
 namespace tonewerk {

@@ -5,7 +5,7 @@
 #include <string>
 #include <sys/types.h>
 
-#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
 
 namespace tonewerk {
 

@@ -12,8 +12,8 @@
 
 #include "platform/LogCategory.h"
 #include "platform/MessagingConnection.h"
-#include "platform/linux/files/Epoll.h"
-#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/descriptors/Epoll.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
 #include "platform/linux/messagepack/RpcFrameReader.h"
 #include "platform/linux/messaging/RequestWindow.h"
 #include "platform/linux/socket/ReplyOutbox.h"

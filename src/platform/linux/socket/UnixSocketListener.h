@@ -14,7 +14,7 @@
 #include <vector>
 
 #include "platform/MessagingListener.h"
-#include "platform/linux/files/Epoll.h"
+#include "platform/linux/descriptors/Epoll.h"
 #include "platform/linux/messagepack/RpcFrameReader.h"
 #include "platform/linux/socket/ServerSocket.h"
 #include "platform/linux/socket/UnixConnection.h"

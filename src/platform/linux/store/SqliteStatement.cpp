@@ -4,7 +4,7 @@
 #include <sqlite3.h>
 #include <utility>
 
-#include "platform/linux/files/Utf8.h"
+#include "values/Utf8.h"
 
 namespace tonewerk {
 

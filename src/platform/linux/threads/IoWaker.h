@@ -5,7 +5,7 @@
 #include <mutex>
 #include <vector>
 
-#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
 
 namespace tonewerk {
 

@@ -7,7 +7,7 @@
 #include <filesystem>
 #include <unistd.h>
 
-#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
 #include "platform/linux/files/TextFile.h"
 #include "tonewerk/signpost.h"
 

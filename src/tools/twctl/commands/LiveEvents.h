@@ -4,7 +4,7 @@
 #include <chrono>
 #include <optional>
 
-#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
 
 namespace tonewerk {
 

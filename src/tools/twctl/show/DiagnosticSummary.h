@@ -7,7 +7,7 @@
 #include <utility>
 #include <vector>
 
-#include "platform/linux/diagnostics/DiagnosticItem.h"
+#include "platform/linux/diagnostics/collectors/DiagnosticItem.h"
 
 namespace tonewerk {
 

@@ -9,7 +9,7 @@
 #include "bridges/pipewire/sessions/RecordingDaemon.h"
 #include "bridges/pipewire/sessions/Said.h"
 #include "bridges/pipewire/sessions/StreamReports.h"
-#include "platform/linux/socket/UnixAddress.h"
+#include "platform/linux/descriptors/UnixAddress.h"
 #include "support/TemporaryDirectory.h"
 #include "support/manual/ManualClock.h"
 #include "support/manual/ManualEventLoop.h"

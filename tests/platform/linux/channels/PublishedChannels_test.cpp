@@ -14,7 +14,7 @@
 
 #include "platform/chanmeter/ChanmeterChannelSet.h"
 #include "platform/linux/channels/ChannelFailures.h"
-#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
 #include "support/ChannelRecords.h"
 #include "support/TemporaryDirectory.h"
 #include "support/memory/MemoryLog.h"

@@ -20,10 +20,10 @@
 #include "platform/linux/dbus/DbusBytes.h"
 #include "platform/linux/dbus/DbusInterface.h"
 #include "platform/linux/dbus/SdBus.h"
-#include "platform/linux/files/FileDescriptor.h"
-#include "platform/linux/files/Utf8.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
 #include "platform/linux/messagepack/RpcLimits.h"
 #include "platform/linux/messaging/MessagingRig.h"
+#include "values/Utf8.h"
 
 namespace tonewerk {
 namespace {

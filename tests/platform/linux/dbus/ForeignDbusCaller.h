@@ -15,8 +15,8 @@
 
 #include "platform/linux/dbus/DbusBytes.h"
 #include "platform/linux/dbus/DbusService.h"
-#include "platform/linux/files/FileDescriptor.h"
-#include "platform/linux/socket/UnixAddress.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
+#include "platform/linux/descriptors/UnixAddress.h"
 
 namespace tonewerk {
 

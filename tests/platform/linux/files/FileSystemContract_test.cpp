@@ -15,7 +15,7 @@
 #include <unistd.h>
 #include <vector>
 
-#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
 #include "platform/linux/files/LinuxFileSystem.h"
 #include "support/InterceptedCalls.h"
 #include "support/TemporaryDirectory.h"

@@ -7,7 +7,7 @@
 #include <thread>
 #include <unistd.h>
 
-#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
 
 namespace tonewerk {
 namespace {

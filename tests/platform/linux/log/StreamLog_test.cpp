@@ -10,7 +10,7 @@
 #include <vector>
 
 #include "platform/LogLine.h"
-#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
 #include "support/manual/ManualClock.h"
 
 namespace tonewerk {

@@ -14,8 +14,8 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include "platform/linux/descriptors/UnixAddress.h"
 #include "platform/linux/socket/RawClient.h"
-#include "platform/linux/socket/UnixAddress.h"
 #include "support/InterceptedCalls.h"
 #include "support/TemporaryDirectory.h"
 

@@ -18,7 +18,7 @@
 #include <unistd.h>
 #include <vector>
 
-#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
 #include "platform/linux/messagepack/RpcLimits.h"
 #include "platform/linux/messagepack/RpcWriter.h"
 #include "platform/linux/messaging/MessagingRig.h"

@@ -8,9 +8,9 @@
 #include <thread>
 #include <utility>
 
-#include "platform/linux/files/Utf8.h"
 #include "platform/linux/threads/ThreadProperties.h"
 #include "values/ShortenedText.h"
+#include "values/Utf8.h"
 
 namespace tonewerk {
 

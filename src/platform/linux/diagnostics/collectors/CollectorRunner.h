@@ -6,8 +6,8 @@
 #include <memory>
 #include <vector>
 
-#include "platform/linux/diagnostics/DiagnosticItem.h"
 #include "platform/linux/diagnostics/collectors/DiagnosticCollector.h"
+#include "platform/linux/diagnostics/collectors/DiagnosticItem.h"
 
 namespace tonewerk {
 

@@ -16,7 +16,7 @@
 #include <vector>
 
 #include "platform/LogLine.h"
-#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
 #include "platform/linux/files/TextFile.h"
 
 namespace tonewerk {

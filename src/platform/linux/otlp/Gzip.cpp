@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "platform/linux/files/Gzip.h"
+#include "platform/linux/otlp/Gzip.h"
 
 #include <zlib.h>
 

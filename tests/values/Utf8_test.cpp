@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "platform/linux/files/Utf8.h"
+#include "values/Utf8.h"
 
 #include <cstdint>
 #include <gmock/gmock.h>

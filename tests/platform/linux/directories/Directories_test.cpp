@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "platform/linux/files/Directories.h"
+#include "platform/linux/directories/Directories.h"
 
 #include <gtest/gtest.h>
 #include <map>

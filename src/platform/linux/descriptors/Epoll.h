@@ -8,7 +8,7 @@
 #include <span>
 #include <sys/epoll.h>
 
-#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
 
 namespace tonewerk {
 

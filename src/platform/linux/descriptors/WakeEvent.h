@@ -6,7 +6,7 @@
 #include <sys/eventfd.h>
 #include <unistd.h>
 
-#include "platform/linux/files/FileDescriptor.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
 
 namespace tonewerk {
 
