@@ -104,30 +104,6 @@ TEST(RequestSetTest, FindsAMethodByItsWholeName) {
   EXPECT_EQ(interface.find(""), std::nullopt);
 }
 
-class CountingGauge final : public InFlightCounter {
- public:
-  void finished(std::size_t size) override {
-    ++requests;
-    bytes += size;
-  }
-  int requests = 0;
-  std::size_t bytes = 0;
-};
-
-TEST(RequestTokenTest, FinishesItsRequestOnceWhereverItIsCarried) {
-  const auto gauge = std::make_shared<CountingGauge>();
-  {
-    InFlightToken token(gauge, 10);
-    InFlightToken carried = std::move(token);
-    InFlightToken other(gauge, 5);
-    other = std::move(carried);
-    EXPECT_EQ(gauge->requests, 1);  // the one that was assigned over
-    EXPECT_EQ(gauge->bytes, 5U);
-  }
-  EXPECT_EQ(gauge->requests, 2);
-  EXPECT_EQ(gauge->bytes, 15U);
-}
-
 TEST(RequestSetTest, WhatIsForTheOwnerIsForTheDaemonsUserAndRoot) {
   constexpr std::uint32_t kOwner = 500;
   const Method method{"watch", {}, {}, 0, true};

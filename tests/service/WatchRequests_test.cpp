@@ -5,6 +5,7 @@
 #include <string>
 #include <vector>
 
+#include "protocol/Requests.h"
 #include "service/MessageFilter.h"
 #include "service/SessionListing.h"
 #include "support/ServiceTest.h"
