@@ -5,24 +5,26 @@
 #include <cstdint>
 #include <random>
 
+#include "values/GrowingDelay.h"
+
 namespace tonewerk {
 
-// How long to wait before the next attempt: twice as long as before the last one, up to a bound, and up to a
-// quarter more or less than that, so that clients that lost one daemon do not all come back at once.
+// A growing delay, and up to a quarter more or less than that, so that clients that lost one daemon do not
+// all come back at once.
 class Backoff {
  public:
   Backoff(std::chrono::milliseconds first, std::chrono::milliseconds most, std::uint32_t seed)
-      : first_(first), most_(most), next_(first), random_(seed) {}
+      : first_(first), most_(most), delay_(first, most), random_(seed) {}
 
   // At least the first delay, at most the longest.
   std::chrono::milliseconds next();
   // What was connected to was good: the next delay is the first again.
-  void reset() { next_ = first_; }
+  void reset() { delay_.reset(); }
 
  private:
   std::chrono::milliseconds first_;
   std::chrono::milliseconds most_;
-  std::chrono::milliseconds next_;
+  GrowingDelay delay_;
   std::minstd_rand random_;
 };
 

@@ -1,13 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <chrono>
 #include <memory>
 
 #include "bridges/pipewire/Console.h"
-#include "bridges/pipewire/RetryDelay.h"
 #include "bridges/pipewire/graph/GraphModel.h"
 #include "bridges/pipewire/graph/PipeWireLoop.h"
 #include "bridges/pipewire/graph/ProfileObserver.h"
+#include "values/GrowingDelay.h"
 
 struct pw_context;
 
@@ -43,7 +44,7 @@ class PipeWireGraph {
   PipeWireLoop& loop_;
   pw_context* context_ = nullptr;
   std::unique_ptr<Connection> connection_;
-  RetryDelay retryDelay_;
+  GrowingDelay retryDelay_{std::chrono::milliseconds(250), std::chrono::milliseconds(4000)};
   bool established_ = false;  // the daemon of this connection has spoken
   bool saidAbsent_ = false;
   std::unique_ptr<EventLoop::Timer> retryTimer_;

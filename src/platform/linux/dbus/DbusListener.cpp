@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/dbus/DbusListener.h"
 
-#include <algorithm>
 #include <cassert>
 #include <cstdlib>
 #include <poll.h>
@@ -47,7 +46,7 @@ void DbusListener::run() {
       const DbusService::End end = service.serve(isStopping_);
       tell(end, service.problem());
     }
-    if (std::chrono::steady_clock::now() - start >= kLongestPause) pause_ = kFirstPause;
+    if (std::chrono::steady_clock::now() - start >= kLongestPause) pause_.reset();
     pause();
   }
 }
@@ -66,8 +65,7 @@ void DbusListener::tell(DbusService::End end, const std::string& problem) {
 
 // Until it is time to try again, or somebody stops the listener.
 void DbusListener::pause() {
-  const auto end = std::chrono::steady_clock::now() + pause_;
-  pause_ = std::min(pause_ * 2, kLongestPause);
+  const auto end = std::chrono::steady_clock::now() + pause_.next();
   while (!isStopping_) {
     const auto left = std::chrono::ceil<std::chrono::milliseconds>(end - std::chrono::steady_clock::now());
     if (left <= std::chrono::milliseconds::zero()) return;

@@ -14,6 +14,7 @@
 #include "platform/linux/dbus/DbusInterface.h"
 #include "platform/linux/dbus/DbusService.h"
 #include "platform/linux/threads/IoWaker.h"
+#include "values/GrowingDelay.h"
 
 namespace tonewerk {
 
@@ -55,7 +56,7 @@ class DbusListener final : public MessagingListener {
 
   // The bus's thread's.
   RpcStrings texts_;
-  std::chrono::milliseconds pause_ = kFirstPause;
+  GrowingDelay pause_{kFirstPause, kLongestPause};
   std::optional<DbusService::End> lastEnd_;
 
   std::mutex lifeMutex_;  // of resume() and shutDown()

@@ -84,7 +84,7 @@ void DirectoryWatcher::run() {
 int DirectoryWatcher::patience() {
   if (!unopened_.empty()) return 0;
   if (!mustRetry_) return -1;
-  return static_cast<int>(std::exchange(retry_, std::min(2 * retry_, kLastRetry)).count());
+  return static_cast<int>(std::chrono::duration_cast<std::chrono::milliseconds>(retry_.next()).count());
 }
 
 void DirectoryWatcher::readEvents() {
@@ -160,7 +160,7 @@ void DirectoryWatcher::attach() {
   const bool isMissing = failure == ENOENT || failure == ENOTDIR;
   const bool isAwaited = hasAncestor && (isMissing || failure == EACCES);
   mustRetry_ = directoryWatch_ < 0 && !isAwaited;
-  if (!mustRetry_) retry_ = kFirstRetry;
+  if (!mustRetry_) retry_.reset();
   noteProblem(isMissing ? 0 : failure);
 }
 

@@ -10,6 +10,7 @@
 
 #include "platform/LogCategory.h"
 #include "platform/linux/descriptors/FileDescriptor.h"
+#include "values/GrowingDelay.h"
 
 namespace tonewerk {
 
@@ -83,7 +84,7 @@ class DirectoryWatcher {
   std::set<std::string, std::less<>> opened_;    // somebody has
   bool mustRetry_ = false;
   int problem_ = 0;  // the one last logged
-  std::chrono::milliseconds retry_ = kFirstRetry;
+  GrowingDelay retry_{kFirstRetry, kLastRetry};
 
   std::thread thread_;  // last: it uses all above
 };

@@ -59,9 +59,7 @@ RetryPolicy::Verdict RetryPolicy::verdictOf(int status) {
 }
 
 RetryPolicy::Duration RetryPolicy::delayAfterFailure(std::optional<std::chrono::seconds> asked) {
-  const Duration interval = interval_;
-  const auto grown = std::chrono::duration_cast<Duration>(interval * kFactor);
-  interval_ = std::min<Duration>(grown, kLongest);
+  const Duration interval = interval_.next();
   if (asked) return std::clamp(*asked, kShortestAsked, kLongestAsked);
   return std::chrono::duration_cast<Duration>(interval * (0.5 + 0.5 * jitter_()));
 }

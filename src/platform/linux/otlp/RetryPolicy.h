@@ -5,13 +5,16 @@
 #include <functional>
 #include <optional>
 #include <string_view>
+#include <utility>
+
+#include "values/GrowingDelay.h"
 
 namespace tonewerk {
 
 // When an exporter tries again.
 class RetryPolicy {
  public:
-  using Duration = std::chrono::nanoseconds;
+  using Duration = GrowingDelay::Duration;
 
   static constexpr std::chrono::seconds kFirst{5};
   static constexpr double kFactor = 1.5;
@@ -36,11 +39,11 @@ class RetryPolicy {
   // How long to wait after a failure: what the endpoint asked for, or half to the whole of an interval that
   // grows by half with every failure in a row.
   Duration delayAfterFailure(std::optional<std::chrono::seconds> asked);
-  void succeeded() { interval_ = kFirst; }
+  void succeeded() { interval_.reset(); }
 
  private:
   std::function<double()> jitter_;
-  Duration interval_ = kFirst;
+  GrowingDelay interval_{kFirst, kLongest, kFactor};
 };
 
 // The time that a Retry-After header asks for, as seconds from now or as a date of HTTP; `now` in seconds

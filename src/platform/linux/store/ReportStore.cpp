@@ -8,6 +8,7 @@
 #include "platform/Clock.h"
 #include "platform/LogLine.h"
 #include "platform/PreferenceStore.h"
+#include "values/GrowingDelay.h"
 
 namespace tonewerk {
 namespace {
@@ -72,11 +73,12 @@ void ReportStore::run() {
 
 // False when the store ends without the rows being written.
 bool ReportStore::writeUntilDone() {
-  for (std::chrono::milliseconds backOff = kFirstBackOff;; backOff = std::min(2 * backOff, kLongestBackOff)) {
+  GrowingDelay backOff(kFirstBackOff, kLongestBackOff);
+  for (;;) {
     queue_.attempt();
     if (write()) break;
     queue_.failed();
-    if (!queue_.pause(backOff)) {
+    if (!queue_.pause(backOff.next())) {
       if (!write()) return false;
       break;
     }

@@ -101,7 +101,7 @@ void StoreQueue::failed() {
   progress_.notify_all();
 }
 
-bool StoreQueue::pause(std::chrono::milliseconds time) {
+bool StoreQueue::pause(std::chrono::nanoseconds time) {
   std::unique_lock lock(mutex_);
   work_.wait_for(lock, time, [&] { return stopped_ || lastFlush_ > attemptedFlush_; });
   return !stopped_;

@@ -65,7 +65,7 @@ class StoreQueue {
   void failed();
   // Returns after `time` or when flush() or stop() ask for another try. False when stopped: that try is the
   // last.
-  bool pause(std::chrono::milliseconds time);
+  bool pause(std::chrono::nanoseconds time);
 
   // The number of rows dropped since the last time.
   std::uint64_t takeDropped();
