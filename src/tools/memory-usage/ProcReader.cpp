@@ -2,37 +2,22 @@
 #include "tools/memory-usage/ProcReader.h"
 
 #include <algorithm>
-#include <array>
-#include <cerrno>
 #include <charconv>
-#include <cstdio>
 #include <filesystem>
-#include <memory>
 #include <string_view>
 #include <system_error>
 
 #include "platform/linux/files/KeyValueLines.h"
+#include "platform/linux/files/TextFile.h"
 #include "platform/linux/system/ProcessStat.h"
 
 namespace tonewerk {
 namespace {
 
-constexpr std::size_t kMaxFileBytes = std::size_t{1} << 20;
-
-// The file's text, and errno's value of why there is none. None of these files is empty.
-int readFile(const std::string& path, std::string& text) {
-  text.clear();
-  errno = 0;
-  const std::unique_ptr<std::FILE, int (*)(std::FILE*)> file(std::fopen(path.c_str(), "re"), &std::fclose);
-  if (file == nullptr) return errno;
-  std::array<char, 4096> buffer;
-  while (text.size() < kMaxFileBytes) {
-    const std::size_t count = std::fread(buffer.data(), 1, buffer.size(), file.get());
-    text.append(buffer.data(), count);
-    if (count < buffer.size()) break;
-  }
-  if (std::ferror(file.get()) != 0) return errno;
-  return text.empty() ? EIO : 0;
+// None of these files is empty.
+std::error_code readFile(const std::string& path, std::string& text) {
+  if (const std::error_code error = readFileBytes(path, text)) return error;
+  return text.empty() ? std::make_error_code(std::errc::io_error) : std::error_code();
 }
 
 template <typename Number>
@@ -51,7 +36,9 @@ std::string printable(std::string_view name) {
   return text;
 }
 
-bool isGone(int error) { return error == ENOENT || error == ESRCH; }
+bool isGone(const std::error_code& error) {
+  return error == std::errc::no_such_file_or_directory || error == std::errc::no_such_process;
+}
 
 double secondsOf(std::string_view ticks, double ticksPerSecond) {
   return static_cast<double>(numberOf<std::uint64_t>(ticks).value_or(0)) / ticksPerSecond;
@@ -90,7 +77,7 @@ std::optional<UsageSnapshot> ProcReader::read(std::string& problem) const {
 ProcReader::Outcome ProcReader::readProcess(const std::string& number, ProcessUsage& process) const {
   const std::string directory = root_ + "/" + number;
   std::string text;
-  if (const int error = readFile(directory + "/status", text)) {
+  if (const std::error_code error = readFile(directory + "/status", text)) {
     return isGone(error) ? Outcome::kGone : Outcome::kUnreadable;
   }
   const KeyValueLines status(text);
@@ -107,7 +94,7 @@ ProcReader::Outcome ProcReader::readProcess(const std::string& number, ProcessUs
   process.usage.swapped = numberAt("VmSwap");
 
   std::string statText;
-  if (const int error = readFile(directory + "/stat", statText)) {
+  if (const std::error_code error = readFile(directory + "/stat", statText)) {
     return isGone(error) ? Outcome::kGone : Outcome::kUnreadable;
   }
   const std::optional<ProcessStat> stat = ProcessStat::parse(statText);
@@ -119,7 +106,7 @@ ProcReader::Outcome ProcReader::readProcess(const std::string& number, ProcessUs
 
 bool ProcReader::readSystem(MemoryUsage& system) const {
   std::string text;
-  if (readFile(root_ + "/meminfo", text) != 0) return false;
+  if (readFile(root_ + "/meminfo", text)) return false;
   const KeyValueLines memory(text);
   const auto numberAt = [&](std::string_view name) { return memory.number(name).value_or(0); };
   if (numberAt("MemTotal") == 0) return false;
@@ -140,7 +127,7 @@ bool ProcReader::readSystem(MemoryUsage& system) const {
 void ProcReader::readProcessorTime(MemoryUsage& system) const {
   constexpr std::size_t kWords = 8;
   std::string text;
-  if (readFile(root_ + "/stat", text) != 0) return;
+  if (readFile(root_ + "/stat", text)) return;
   const auto words = splitWhitespace(std::string_view(text).substr(0, text.find('\n')));
   if (words.size() < kWords || words[0] != "cpu") return;
   const auto seconds = [&](std::size_t word) { return secondsOf(words[word], ticksPerSecond_); };
