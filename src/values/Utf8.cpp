@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "values/Utf8.h"
 
+#include <algorithm>
 #include <cstddef>
 #include <cstdint>
 #include <cstring>
@@ -32,8 +33,8 @@ bool mayFollow(std::uint8_t first, std::uint8_t second) {
 std::size_t matchingBytes(std::string_view text, std::size_t announced) {
   std::size_t count = 1;
   while (count < announced && count < text.size()) {
-    const std::uint8_t byte = byteAt(text, count);
-    const bool matches = count == 1 ? mayFollow(byteAt(text, 0), byte) : (byte & 0xC0U) == 0x80U;
+    const bool matches =
+        count == 1 ? mayFollow(byteAt(text, 0), byteAt(text, count)) : isUtf8Continuation(text[count]);
     if (!matches) break;
     ++count;
   }
@@ -79,6 +80,10 @@ std::size_t validBytes(std::string_view text, Noncharacters noncharacters) {
 std::size_t utf8CharacterLength(std::string_view text) {
   const std::size_t announced = announcedLength(byteAt(text, 0));
   return announced > 0 && matchingBytes(text, announced) == announced ? announced : 0;
+}
+
+std::size_t utf8Characters(std::string_view text) {
+  return text.size() - static_cast<std::size_t>(std::count_if(text.begin(), text.end(), isUtf8Continuation));
 }
 
 bool isUtf8(std::string_view text) { return validBytes(text, Noncharacters::kTaken) == text.size(); }

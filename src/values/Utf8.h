@@ -10,6 +10,12 @@ namespace tonewerk {
 // The length of the character at the start of `text`, which is not empty; 0 when no well-formed one is there.
 std::size_t utf8CharacterLength(std::string_view text);
 
+// Whether `byte` goes on with a character that another one begins.
+inline bool isUtf8Continuation(char byte) { return (static_cast<unsigned char>(byte) & 0xC0U) == 0x80U; }
+
+// The characters of `text`: of each sequence the first byte counts, also where it is not well-formed.
+std::size_t utf8Characters(std::string_view text);
+
 // Whether `text` is well-formed UTF-8: no overlong forms, no surrogates, nothing above U+10FFFF. Zero bytes
 // are text.
 bool isUtf8(std::string_view text);

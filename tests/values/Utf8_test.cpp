@@ -117,5 +117,11 @@ TEST(TextTest, IsEveryCharacterButTheNoncharacters) {
   EXPECT_FALSE(isText("\xED\xA0\x80"));
 }
 
+TEST(Utf8CharactersTest, AreCountedByTheirFirstBytes) {
+  EXPECT_EQ(utf8Characters(""), 0U);
+  EXPECT_EQ(utf8Characters("a\xC3\xBC\xE2\x82\xAC\xF0\x9F\x8E\xB5"), 4U);
+  EXPECT_EQ(utf8Characters("\xFF\xE2\x82"), 2U) << "not well-formed";
+}
+
 }  // namespace
 }  // namespace tonewerk

@@ -6,12 +6,14 @@
 #include <memory>
 #include <ostream>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "platform/linux/diagnostics/DiagnosticsDirectory.h"
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/show/DiagnosticSummary.h"
 #include "tools/twctl/show/Table.h"
+#include "values/ShortenedText.h"
 
 namespace tonewerk {
 namespace {
@@ -61,12 +63,10 @@ void printField(std::ostream& out, const char* name, const std::string& value) {
 }
 
 // What fits on a screen, cut between characters.
-std::string shortened(const std::string& text) {
+std::string beginningOf(const std::string& text) {
   constexpr std::size_t kMax = 1000;
-  if (text.size() <= kMax) return text;
-  std::size_t end = kMax;
-  while (end > 0 && (static_cast<unsigned char>(text[end]) & 0xC0) == 0x80) --end;
-  return text.substr(0, end) + " ...";
+  const std::string_view beginning = shortened(text, kMax);
+  return std::string(beginning) + (beginning.size() < text.size() ? " ..." : "");
 }
 
 void printSummary(std::ostream& out, const DiagnosticSummary& summary) {
@@ -76,7 +76,7 @@ void printSummary(std::ostream& out, const DiagnosticSummary& summary) {
   printField(out, "process", summary.process);
   printField(out, "component", summary.component);
   printField(out, "duration", summary.duration.empty() ? "" : summary.duration + " s");
-  printField(out, "payload", shortened(summary.payload));
+  printField(out, "payload", beginningOf(summary.payload));
 }
 
 void printForPeople(std::ostream& out, const DiagnosticsDirectory& directory,

@@ -6,6 +6,7 @@
 #include <utility>
 
 #include "values/CompactJson.h"
+#include "values/Utf8.h"
 
 namespace tonewerk {
 namespace {
@@ -16,12 +17,6 @@ std::string jsonOf(const Value& value) {
   return json;
 }
 
-// Characters, not bytes: of each UTF-8 sequence the first byte counts.
-std::size_t widthOf(const std::string& text) {
-  return static_cast<std::size_t>(std::count_if(
-      text.begin(), text.end(), [](char c) { return (static_cast<unsigned char>(c) & 0xC0) != 0x80; }));
-}
-
 }  // namespace
 
 Table::Cell::Cell(const Value& value) : text(value.text()), json(jsonOf(value)) {}
@@ -30,7 +25,7 @@ Table::Cell Table::Cell::time(double seconds) { return {textOf(Date{seconds}), j
 
 Table::Table(std::ostream& out, bool asJson, std::vector<std::string> columns)
     : out_(out), asJson_(asJson), columns_(std::move(columns)) {
-  for (const std::string& column : columns_) widths_.push_back(widthOf(column));
+  for (const std::string& column : columns_) widths_.push_back(utf8Characters(column));
 }
 
 Table::~Table() { print(); }
@@ -45,7 +40,7 @@ void Table::add(std::vector<Cell> cells) {
   }
   std::vector<std::string> texts;
   for (std::size_t at = 0; at < columns_.size(); ++at) {
-    widths_[at] = std::max(widths_[at], widthOf(cells[at].text));
+    widths_[at] = std::max(widths_[at], utf8Characters(cells[at].text));
     texts.push_back(std::move(cells[at].text));
   }
   rows_.push_back(std::move(texts));
@@ -62,7 +57,7 @@ void Table::print() {
 void Table::printRow(const std::vector<std::string>& texts) {
   for (std::size_t at = 0; at < texts.size(); ++at) {
     out_ << texts[at];
-    if (at + 1 < texts.size()) out_ << std::string(widths_[at] - widthOf(texts[at]) + 2, ' ');
+    if (at + 1 < texts.size()) out_ << std::string(widths_[at] - utf8Characters(texts[at]) + 2, ' ');
   }
   out_ << '\n';
 }

@@ -10,6 +10,7 @@
 #include "protocol/WatchKeys.h"
 #include "tools/twctl/show/PrintableText.h"
 #include "tools/twctl/show/Table.h"
+#include "values/Utf8.h"
 
 namespace tonewerk {
 namespace {
@@ -57,11 +58,11 @@ std::vector<std::string> linesOf(const std::string& text) {
   return lines;
 }
 
-// The first `columns` characters; of each UTF-8 sequence the first byte counts.
+// The first `columns` characters, as utf8Characters() counts them.
 std::string cutTo(std::size_t columns, const std::string& line) {
   std::size_t characters = 0;
   for (std::size_t at = 0; at < line.size(); ++at) {
-    if ((static_cast<unsigned char>(line[at]) & 0xC0U) == 0x80U) continue;
+    if (isUtf8Continuation(line[at])) continue;
     if (characters++ == columns) return line.substr(0, at);
   }
   return line;
