@@ -10,6 +10,7 @@
 #include "platform/linux/files/KeyValueLines.h"
 #include "platform/linux/files/TextFile.h"
 #include "platform/linux/system/ProcessStat.h"
+#include "values/ControlCharacters.h"
 
 namespace tonewerk {
 namespace {
@@ -26,14 +27,6 @@ std::optional<Number> numberOf(std::string_view word) {
   const auto [end, error] = std::from_chars(word.data(), word.data() + word.size(), number);
   if (error != std::errc() || end != word.data() + word.size()) return std::nullopt;
   return number;
-}
-
-// Names are anybody's choice.
-std::string printable(std::string_view name) {
-  std::string text(name);
-  std::replace_if(
-      text.begin(), text.end(), [](char c) { return c < ' ' || c > '~'; }, '?');
-  return text;
 }
 
 bool isGone(const std::error_code& error) {
@@ -86,7 +79,7 @@ ProcReader::Outcome ProcReader::readProcess(const std::string& number, ProcessUs
   if (!status.find("RssAnon")) return Outcome::kWithoutMemory;
   process.process = numberOf<std::int32_t>(number).value_or(0);
   process.user = static_cast<std::uint32_t>(numberAt("Uid"));
-  process.name = printable(status.find("Name").value_or("?"));
+  process.name = printableAscii(std::string(status.find("Name").value_or("?")));
   process.usage.anonymous = numberAt("RssAnon");
   process.usage.shared = numberAt("RssFile") + numberAt("RssShmem");
   process.usage.locked = numberAt("VmLck");

@@ -3,6 +3,8 @@
 
 #include <string_view>
 
+#include "values/ControlCharacters.h"
+
 namespace tonewerk {
 namespace {
 
@@ -10,11 +12,7 @@ namespace {
 std::string plain(std::string_view text) {
   constexpr std::string_view kSpecial = "\\`*_[]<>#|&~";
   std::string out;
-  for (const char c : text) {
-    if (static_cast<unsigned char>(c) < ' ' || c == '\x7f') {
-      out += ' ';
-      continue;
-    }
+  for (const char c : withoutControlCharacters(std::string(text), ' ')) {
     if (kSpecial.find(c) != std::string_view::npos) out += '\\';
     out += c;
   }

@@ -4,6 +4,8 @@
 #include <charconv>
 #include <nlohmann/json.hpp>
 
+#include "values/ControlCharacters.h"
+
 namespace tonewerk {
 namespace {
 
@@ -45,13 +47,8 @@ std::optional<OtlpAnswer> parseOtlpAnswer(std::string_view body) {
 }
 
 std::string quotable(std::string_view text) {
-  std::string quoted(text.substr(0, kMaxQuoted));
-  for (char& c : quoted) {
-    const auto byte = static_cast<unsigned char>(c);
-    // Bytes beyond ASCII go, too: a cut may have left part of a character.
-    if (byte < 0x20 || byte >= 0x7F) c = '?';
-  }
-  return quoted;
+  // Bytes beyond ASCII go, too: a cut may have left part of a character.
+  return printableAscii(std::string(text.substr(0, kMaxQuoted)));
 }
 
 }  // namespace tonewerk

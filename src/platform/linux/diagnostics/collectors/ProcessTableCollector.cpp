@@ -7,19 +7,12 @@
 #include <vector>
 
 #include "platform/linux/diagnostics/collectors/ProcessTable.h"
+#include "values/ControlCharacters.h"
 
 namespace tonewerk {
 namespace {
 
 constexpr std::uint64_t kKibibyte = 1024;
-
-// A process may call itself anything, line breaks included.
-std::string printable(std::string name) {
-  for (char& c : name) {
-    if (static_cast<unsigned char>(c) < ' ' || c == '\x7f') c = '?';
-  }
-  return name;
-}
 
 std::string lineOf(const ProcessRow& row) {
   std::array<char, 160> text{};
@@ -28,7 +21,8 @@ std::string lineOf(const ProcessRow& row) {
                 static_cast<unsigned long long>(row.residentBytes / kKibibyte),
                 static_cast<unsigned long long>(row.privateBytes / kKibibyte),
                 static_cast<unsigned long long>(row.lockedBytes / kKibibyte));
-  return text.data() + printable(row.name) + "\n";
+  // A process may call itself anything, line breaks included.
+  return text.data() + withoutControlCharacters(row.name) + "\n";
 }
 
 bool hadMoreTime(const ProcessRow& a, const ProcessRow& b) { return a.processorSeconds > b.processorSeconds; }
