@@ -1,9 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <cstdint>
 #include <optional>
 #include <string>
+#include <system_error>
+#include <utility>
 
+#include "platform/linux/system/ProcessFiles.h"
 #include "tools/memory-usage/MemoryUsage.h"
 
 namespace tonewerk {
@@ -14,7 +18,7 @@ class ProcReader {
  public:
   // `root` is "/proc", or what looks like it. `ticksPerSecond` of its processor times.
   ProcReader(std::string root, double ticksPerSecond)
-      : root_(std::move(root)), ticksPerSecond_(ticksPerSecond) {}
+      : root_(std::move(root)), files_(root_), ticksPerSecond_(ticksPerSecond) {}
 
   // Processes in order of their numbers. None, and why in `problem`, when there is no such directory or it
   // does not say how much memory there is. A process that ends meanwhile is left out.
@@ -22,11 +26,13 @@ class ProcReader {
 
  private:
   enum class Outcome { kRead, kGone, kWithoutMemory, kUnreadable };
-  Outcome readProcess(const std::string& number, ProcessUsage& process) const;
+  static Outcome outcomeOf(const std::error_code& error);
+  Outcome readProcess(std::int32_t identifier, ProcessUsage& process) const;
   bool readSystem(MemoryUsage& system) const;
   void readProcessorTime(MemoryUsage& system) const;
 
   const std::string root_;
+  const ProcessFiles files_;
   const double ticksPerSecond_;
 };
 

@@ -1,9 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <charconv>
 #include <cstddef>
 #include <optional>
 #include <string_view>
+#include <system_error>
 #include <vector>
 
 namespace tonewerk {
@@ -19,6 +21,14 @@ inline std::vector<std::string_view> splitWhitespace(std::string_view text) {
     words.push_back(text.substr(0, text.find_first_of(kWhiteSpace)));
     text.remove_prefix(words.back().size());
   }
+}
+
+// The number that is the whole word; 0 where it is none.
+template <typename Number>
+Number numberIn(std::string_view word) {
+  Number number{};
+  const auto parsed = std::from_chars(word.data(), word.data() + word.size(), number);
+  return parsed.ec == std::errc() && parsed.ptr == word.data() + word.size() ? number : Number{};
 }
 
 // The text of /proc/PID/stat, "PID (name) S 1 ...".
