@@ -5,8 +5,8 @@
 #include <utility>
 
 #include "client/MessageFrame.h"
-#include "client/RequestBody.h"
 #include "platform/linux/messagepack/RpcLimits.h"
+#include "platform/linux/messagepack/RpcWriter.h"
 
 namespace tonewerk {
 namespace {
@@ -39,7 +39,7 @@ RingMessage lossOf(const twr_session& session, std::uint64_t lostBefore) {
 bool fitsFrame(const ValueMap& configuration) {
   std::string body;
   appendChange(body, {Kind::kConfiguration, TWR_SERVICE_UNKNOWN, configuration}, 0);
-  return body.size() + kFrameHeadBytes + kReporterIDBytes <= kMaxFrameBytes;
+  return body.size() + RpcWriter::kMaxHeadBytes + kReporterIDBytes <= kMaxFrameBytes;
 }
 
 // A command of a session marks each of its senders' rings.
@@ -227,7 +227,7 @@ void ClientOutbox::recreate(twr_session& session) {
     frame.origin = OutgoingFrame::Origin::kRecreation;
     const bool isAwaited = session.starts != nullptr && !session.starts->waiting.empty();
     if (change.kind == Kind::kStart && isAwaited) frame.identifier = replies_.add({{}, session.starts, true});
-    appendFrameHead(batch_.bytes(), frame.optionalIdentifier());
+    RpcWriter(batch_.bytes()).head(frame.optionalIdentifier());
     appendChange(batch_.bytes(), change, session.identifier);
     batch_.add(std::move(frame));
   }
@@ -250,7 +250,7 @@ void ClientOutbox::encodeNext() {
   }
   OutgoingFrame frame;
   if (command.reply) frame.identifier = replies_.add({command.reply, nullptr, false});
-  if (command.kind != Command::Kind::kBarrier) appendFrameHead(batch_.bytes(), frame.optionalIdentifier());
+  if (command.kind != Command::Kind::kBarrier) RpcWriter(batch_.bytes()).head(frame.optionalIdentifier());
   batch_.bytes() += command.body;
   frame.command = std::move(command);
   batch_.add(std::move(frame));
@@ -332,7 +332,7 @@ void ClientOutbox::encodeChange(Command command) {
   if (entry.reply || (entry.starts != nullptr && !entry.starts->waiting.empty()))
     frame.identifier = replies_.add(std::move(entry));
 
-  appendFrameHead(batch_.bytes(), frame.optionalIdentifier());
+  RpcWriter(batch_.bytes()).head(frame.optionalIdentifier());
   appendChange(batch_.bytes(), change, session.identifier);
   session.told.late += command.lostAfter;
   frame.command = std::move(command);

@@ -6,9 +6,6 @@
 namespace tonewerk {
 namespace {
 
-// A response's kind, its identifier 0 and no error, each a byte after the array's own.
-constexpr std::size_t kBytesBeforeResult = 4;
-
 std::uint16_t serviceTypeOf(const Value* value) {
   const std::int64_t* number = value == nullptr ? nullptr : value->asInteger();
   const bool fits = number != nullptr && *number >= 0 && *number <= TWR_SERVICE_UNKNOWN;
@@ -33,8 +30,7 @@ DecodedAnswer::DecodedAnswer(const RpcFrame& response) : DecodedAnswer(TWR_OK) {
     return;
   }
   value_ = response.result;
-  if (!value_) return;
-  RpcWriter(result_).response(0, std::nullopt, value_);
+  if (value_) RpcWriter(result_).value(*value_);
 }
 
 void DecodedAnswer::take(const Value& error) {
@@ -52,8 +48,8 @@ const twr_answer& DecodedAnswer::as(AnswerKind kind) {
   answer_.error_domain = errorDomain_.c_str();
   answer_.error_message = errorMessage_.c_str();
   if (!result_.empty()) {
-    answer_.result = result_.data() + kBytesBeforeResult;
-    answer_.result_size = result_.size() - kBytesBeforeResult;
+    answer_.result = result_.data();
+    answer_.result_size = result_.size();
   }
   answer_.reporter_id = 0;
   answer_.service_type = TWR_SERVICE_UNKNOWN;

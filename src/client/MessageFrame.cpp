@@ -3,8 +3,8 @@
 
 #include <string_view>
 
-#include "client/RequestBody.h"
 #include "platform/linux/messagepack/RpcPacker.h"
+#include "platform/linux/messagepack/RpcWriter.h"
 #include "protocol/Requests.h"
 
 namespace tonewerk {
@@ -71,7 +71,7 @@ std::size_t appendMessageFrame(std::string& out, std::optional<std::uint32_t> re
   const bool stamps = !isStamped(bytes);
   const bool tellsLoss = dropped > 0;
 
-  appendFrameHead(out, requestIdentifier);
+  RpcWriter(out).head(requestIdentifier);
   StringOutput output{out};
   RpcPacker packer(output);
   packer.text(requests::kSendMessage.name);

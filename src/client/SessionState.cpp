@@ -4,7 +4,7 @@
 #include <string_view>
 #include <utility>
 
-#include "client/RequestBody.h"
+#include "platform/linux/messagepack/RpcWriter.h"
 #include "protocol/Requests.h"
 
 namespace tonewerk {
@@ -74,19 +74,19 @@ std::vector<SessionChange> changesBetween(const SessionState& from, const Sessio
 void appendChange(std::string& out, const SessionChange& change, std::int64_t reporterID) {
   switch (change.kind) {
     case Kind::kCreate:
-      return appendRequestBody(out, requests::kCreateReportingSession.name, {Value(reporterID)});
+      return RpcWriter(out).body(requests::kCreateReportingSession.name, {Value(reporterID)});
     case Kind::kServiceType:
-      return appendRequestBody(out, requests::kSetServiceType.name,
-                               {Value(change.serviceType), Value(reporterID)});
+      return RpcWriter(out).body(requests::kSetServiceType.name,
+                                 {Value(change.serviceType), Value(reporterID)});
     case Kind::kConfiguration:
-      return appendRequestBody(out, requests::kSetConfiguration.name,
-                               {Value(change.configuration), Value(reporterID)});
+      return RpcWriter(out).body(requests::kSetConfiguration.name,
+                                 {Value(change.configuration), Value(reporterID)});
     case Kind::kStart:
-      return appendRequestBody(out, requests::kStartReportingSessionForID.name, {Value(reporterID)});
+      return RpcWriter(out).body(requests::kStartReportingSessionForID.name, {Value(reporterID)});
     case Kind::kStop:
-      return appendRequestBody(out, requests::kStopReportingSessionForID.name, {Value(reporterID)});
+      return RpcWriter(out).body(requests::kStopReportingSessionForID.name, {Value(reporterID)});
     case Kind::kDestroy:
-      return appendRequestBody(out, requests::kDestroyReportingSession.name, {Value(reporterID)});
+      return RpcWriter(out).body(requests::kDestroyReportingSession.name, {Value(reporterID)});
   }
 }
 

@@ -21,6 +21,7 @@
 #include "client/RequestBody.h"
 #include "client/SocketPaths.h"
 #include "platform/linux/messagepack/RpcLimits.h"
+#include "platform/linux/messagepack/RpcWriter.h"
 #include "protocol/Requests.h"
 #include "values/Utf8.h"
 
@@ -98,7 +99,7 @@ twr_status ask(twr_client* client, std::string_view method, const Arguments& arg
   return guarded([&] {
     return client->engine.request([&](ClientOutbox& outbox) {
       std::string body;
-      appendRequestBody(body, method, arguments);
+      RpcWriter(body).body(method, arguments);
       return outbox.request(std::move(body), reply);
     });
   });
@@ -235,7 +236,7 @@ twr_status twr_client_request(twr_client* client, const char* method, const twr_
   return guarded([&] {
     std::string body;
     appendRequestBody(body, method, parameters);
-    if (body.size() + kFrameHeadBytes > kMaxFrameBytes) return TWR_TOO_LARGE;
+    if (body.size() + RpcWriter::kMaxHeadBytes > kMaxFrameBytes) return TWR_TOO_LARGE;
     return client->engine.request([&](ClientOutbox& outbox) {
       PendingReply pending{reply, context};
       pending.mayBeHeld = true;  // who knows what method that is

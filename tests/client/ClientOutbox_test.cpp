@@ -8,10 +8,10 @@
 #include <random>
 
 #include "client/ClientEngine.h"
-#include "client/RequestBody.h"
 #include "client/ScriptedServer.h"
 #include "client/TestPayload.h"
 #include "platform/linux/messagepack/RpcFrameReader.h"
+#include "platform/linux/messagepack/RpcWriter.h"
 
 namespace tonewerk {
 namespace {
@@ -759,7 +759,7 @@ TEST_F(ClientOutboxTest, LeadsTheDaemonToWhatWasAskedForHoweverTheConnectionBrea
     for (int step = 0; step < 300; ++step) {
       if (isTight && below(40) == 0) {
         std::string filler;
-        appendRequestBody(filler, "filler", {Value(std::string(CommandQueue::kReserveBytes - 1000, 'x'))});
+        RpcWriter(filler).body("filler", {Value(std::string(CommandQueue::kReserveBytes - 1000, 'x'))});
         outbox->request(std::move(filler), {});
       }
       const std::size_t action = below(16);

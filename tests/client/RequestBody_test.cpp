@@ -3,29 +3,10 @@
 
 #include <gtest/gtest.h>
 
-#include "client/OneFrame.h"
 #include "client/TestPayload.h"
 
 namespace tonewerk {
 namespace {
-
-TEST(RequestBodyTest, MakesARequestAndANotificationOfOneBody) {
-  std::string body;
-  appendRequestBody(body, "setServiceType", {Value(7), Value(77)});
-  for (const std::optional<std::uint32_t> identifier :
-       {std::optional<std::uint32_t>(), std::optional<std::uint32_t>(1),
-        std::optional<std::uint32_t>(0xFFFFFFFFU)}) {
-    std::string bytes;
-    appendFrameHead(bytes, identifier);
-    EXPECT_LE(bytes.size(), kFrameHeadBytes);
-    const std::optional<RpcFrame> frame = frameOf(bytes + body);
-    ASSERT_TRUE(frame);
-    EXPECT_EQ(frame->kind, identifier ? RpcFrame::Kind::kRequest : RpcFrame::Kind::kNotification);
-    EXPECT_EQ(frame->identifier, identifier.value_or(frame->identifier));
-    EXPECT_EQ(frame->method, "setServiceType");
-    EXPECT_EQ(frame->arguments, (Arguments{Value(7), Value(77)}));
-  }
-}
 
 TEST(RequestBodyTest, ReadsAPayloadAsAMap) {
   TestPayload payload;

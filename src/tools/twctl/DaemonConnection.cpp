@@ -10,7 +10,7 @@
 
 #include "client/ValuePayload.h"
 #include "platform/linux/descriptors/WakeEvent.h"
-#include "platform/linux/messagepack/RpcFrameReader.h"
+#include "platform/linux/messagepack/RpcValueReader.h"
 #include "tonewerk/reporting.h"
 
 namespace tonewerk {
@@ -42,24 +42,6 @@ std::error_code errorOf(twr_status status) {
   }
 }
 
-// Reads results, which are values by themselves, as the frames that they came in.
-class ResultReader {
- public:
-  std::optional<Value> read(const void* bytes, std::size_t size) {
-    if (size == 0) return std::nullopt;
-    frame_.assign("\x94\x01\x00\xC0", 4);  // a response to request 0, without an error
-    frame_.append(static_cast<const char*>(bytes), size);
-    std::string_view rest = frame_;
-    RpcFrameReader reader(texts_);
-    if (reader.next(rest) != RpcFrameReader::Result::kFrame) return std::nullopt;
-    return std::move(reader.frame().result);
-  }
-
- private:
-  RpcStrings texts_;
-  std::string frame_;
-};
-
 }  // namespace
 
 // What has arrived. The library's thread puts, the caller's takes.
@@ -82,7 +64,8 @@ class DaemonConnection::Inbox {
     if (answer.status == TWR_REFUSED) {
       read.error = ReplyError{answer.error_domain, answer.error_code, answer.error_message};
     } else {
-      read.result = reader_.read(answer.result, answer.result_size);
+      read.result =
+          readValue({static_cast<const char*>(answer.result), answer.result_size}, ValuePlace::kResult);
     }
     const std::lock_guard lock(mutex_);
     arrived_.push_back({std::move(handler), std::move(read)});
@@ -124,8 +107,7 @@ class DaemonConnection::Inbox {
   static constexpr milliseconds::rep kLongestPollMs = 60'000;
 
   WakeEvent event_;
-  ResultReader reader_;  // the library's thread's
-  std::mutex mutex_;     // guards what follows
+  std::mutex mutex_;  // guards what follows
   std::deque<Arrival> arrived_;
   bool isGone_ = false;
 };

@@ -51,6 +51,19 @@ void RpcFrameVisitor::init() {
   isReadingArguments_ = false;
 }
 
+void RpcFrameVisitor::initAt(ValuePlace place) {
+  init();
+  if (place == ValuePlace::kResult) {
+    frame_.kind = RpcFrame::Kind::kResponse;
+    framePlace_ = kResultPlace;
+    depth_ = 1;
+  } else {
+    frame_.kind = RpcFrame::Kind::kRequest;
+    framePlace_ = methodPlace(frame_.kind) + 1;
+    startArguments(1);
+  }
+}
+
 bool RpcFrameVisitor::visit_nil() {
   if (isInArguments()) {
     if (frame_.arguments.size() >= kMaxArguments) return refuse("is one too many");

@@ -12,6 +12,7 @@
 #include "platform/linux/messagepack/RpcFrame.h"
 #include "platform/linux/messagepack/RpcFrameReader.h"
 #include "platform/linux/messagepack/RpcLimits.h"
+#include "platform/linux/messagepack/RpcValueReader.h"
 
 namespace tonewerk {
 
@@ -29,6 +30,8 @@ class RpcFrameVisitor {
 
   // Before every frame.
   void init();
+  // Before a value by itself, which goes where it would in a frame.
+  void initAt(ValuePlace place);
 
   bool visit_nil();
   bool visit_boolean(bool value) { return put(Value(value)); }

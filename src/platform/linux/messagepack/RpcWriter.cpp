@@ -2,7 +2,6 @@
 #include "platform/linux/messagepack/RpcWriter.h"
 
 #include <algorithm>
-#include <cstddef>
 
 #include "platform/linux/messagepack/RpcLimits.h"
 #include "platform/linux/messagepack/RpcPacker.h"
@@ -85,23 +84,34 @@ class ValuePacker : public RpcPacker<StringOutput> {
 
 }  // namespace
 
-void RpcWriter::request(std::uint32_t identifier, std::string_view method, const Arguments& arguments) {
+void RpcWriter::head(std::optional<std::uint32_t> identifier) {
+  StringOutput output{out_};
+  RpcPacker packer(output);
+  packer.pack_array(identifier ? 4 : 3);
+  packer.pack_uint8(identifier ? 0 : 2);
+  if (identifier) packer.pack_uint32(*identifier);
+}
+
+void RpcWriter::body(std::string_view method, const Arguments& arguments) {
   StringOutput output{out_};
   ValuePacker packer(output);
-  packer.pack_array(4);
-  packer.pack_uint8(0);
-  packer.pack_uint32(identifier);
   packer.text(method);
   packer.arguments(arguments);
 }
 
+void RpcWriter::request(std::uint32_t identifier, std::string_view method, const Arguments& arguments) {
+  head(identifier);
+  body(method, arguments);
+}
+
 void RpcWriter::notification(std::string_view method, const Arguments& arguments) {
+  head(std::nullopt);
+  body(method, arguments);
+}
+
+void RpcWriter::value(const Value& value) {
   StringOutput output{out_};
-  ValuePacker packer(output);
-  packer.pack_array(3);
-  packer.pack_uint8(2);
-  packer.text(method);
-  packer.arguments(arguments);
+  ValuePacker(output).value(value);
 }
 
 void RpcWriter::response(std::uint32_t identifier, const std::optional<ReplyError>& error,

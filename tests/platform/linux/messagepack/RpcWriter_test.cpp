@@ -33,6 +33,29 @@ TEST(RpcWriterTest, AppendsToWhatIsThere) {
   EXPECT_EQ(out, "x" + fromHex("93 02 A1 6D 90"));
 }
 
+TEST(RpcWriterTest, MakesARequestAndANotificationOfOneBody) {
+  std::string body;
+  RpcWriter(body).body("setServiceType", {Value(7), Value(77)});
+  for (const std::optional<std::uint32_t> identifier :
+       {std::optional<std::uint32_t>(), std::optional<std::uint32_t>(1),
+        std::optional<std::uint32_t>(0xFFFFFFFFU)}) {
+    std::string out;
+    RpcWriter(out).head(identifier);
+    EXPECT_LE(out.size(), RpcWriter::kMaxHeadBytes);
+    out += body;
+    RpcStrings texts;
+    RpcFrameReader reader(texts);
+    std::string_view bytes = out;
+    ASSERT_EQ(reader.next(bytes), RpcFrameReader::Result::kFrame);
+    const RpcFrame& frame = reader.frame();
+    EXPECT_EQ(frame.wireBytes, out.size());
+    EXPECT_EQ(frame.kind, identifier ? RpcFrame::Kind::kRequest : RpcFrame::Kind::kNotification);
+    EXPECT_EQ(frame.identifier, identifier.value_or(frame.identifier));
+    EXPECT_EQ(frame.method, "setServiceType");
+    EXPECT_EQ(frame.arguments, (Arguments{Value(7), Value(77)}));
+  }
+}
+
 TEST(RpcWriterTest, WritesResults) {
   EXPECT_EQ(responseWith(std::nullopt, Value(true)), fromHex("94 01 05 C0 C3"));
   EXPECT_EQ(responseWith(std::nullopt, std::nullopt), fromHex("94 01 05 C0 C0"));
