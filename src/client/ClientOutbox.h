@@ -13,7 +13,7 @@
 #include <vector>
 
 #include "client/CommandQueue.h"
-#include "client/Deliveries.h"
+#include "client/DecodedAnswer.h"
 #include "client/OutgoingBatch.h"
 #include "client/ReplyTable.h"
 #include "client/SessionRecord.h"

@@ -7,8 +7,6 @@
 #include <pthread.h>
 #include <utility>
 
-#include "client/ClientEngine.h"
-
 namespace tonewerk::clientRegistry {
 namespace {
 
@@ -89,3 +87,16 @@ void reapDetached() {
 }
 
 }  // namespace tonewerk::clientRegistry
+
+namespace tonewerk {
+
+twr_client* makeClient(ClientSettings settings) {
+  if (!ClientThread::isCurrent()) clientRegistry::reapDetached();
+  const auto client = std::make_shared<twr_client>(std::move(settings));
+  client->engine.owner = client;
+  if (clientRegistry::add(client->engine)) return client.get();
+  client->engine.owner = nullptr;
+  return nullptr;
+}
+
+}  // namespace tonewerk

@@ -2,10 +2,21 @@
 #pragma once
 
 #include <memory>
+#include <utility>
+
+#include "client/ClientEngine.h"
+
+// What callers hold of a client.
+struct twr_client {  // NOLINT(readability-identifier-naming)
+  explicit twr_client(tonewerk::ClientSettings settings) : engine(std::move(settings)) {}
+
+  tonewerk::ClientEngine engine;
+};
 
 namespace tonewerk {
 
-class ClientEngine;
+// A client that is in the registry and holds itself until it is destroyed. Null without memory.
+twr_client* makeClient(ClientSettings settings);
 
 // The process's clients: for fork(), whose child has copies of them, and for the library's end.
 namespace clientRegistry {

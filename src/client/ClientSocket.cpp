@@ -2,11 +2,14 @@
 #include "client/ClientSocket.h"
 
 #include <cerrno>
+#include <cstdlib>
 #include <optional>
 #include <sys/socket.h>
 #include <sys/time.h>
+#include <unistd.h>
 
 #include "platform/linux/descriptors/UnixAddress.h"
+#include "platform/linux/directories/Directories.h"
 
 namespace tonewerk {
 namespace {
@@ -20,7 +23,23 @@ ClientSocket::Transfer failure(int error) {
   return transfer;
 }
 
+constexpr const char* kSocketVariable = "TONEWERK_REPORTING_SOCKET";
+constexpr const char* kSocketName = "/reporting.sock";
+
+std::optional<std::string> variable(const std::string& name) {
+  const char* value = ::secure_getenv(name.c_str());
+  return value == nullptr ? std::nullopt : std::optional<std::string>(value);
+}
+
 }  // namespace
+
+std::vector<std::string> defaultSocketPaths() {
+  const std::optional<std::string> chosen = variable(kSocketVariable);
+  if (chosen && !chosen->empty()) return {*chosen};
+  const std::string own = Directories::from(variable, ::geteuid()).runtime + kSocketName;
+  const std::string system = Directories::system().runtime + kSocketName;
+  return own == system ? std::vector{system} : std::vector{own, system};
+}
 
 int ClientSocket::open() {
   socket_.reset(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));

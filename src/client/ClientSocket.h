@@ -4,10 +4,16 @@
 #include <cstddef>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "platform/linux/descriptors/FileDescriptor.h"
 
 namespace tonewerk {
+
+// Where a daemon may listen, in the order in which to try: TONEWERK_REPORTING_SOCKET alone when it is set,
+// else in this process's own runtime directory, then in the system's. A program that runs with more rights
+// than its caller has reads no variables of the caller's.
+std::vector<std::string> defaultSocketPaths();
 
 // The client's end of a connection, as bytes. Nothing here waits but connect(), for a fifth of a second at
 // most; no signal is raised, and no program that is executed inherits the descriptor.

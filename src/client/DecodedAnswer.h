@@ -2,10 +2,12 @@
 #pragma once
 
 #include <cstdint>
+#include <memory>
+#include <optional>
 #include <string>
 #include <vector>
 
-#include "client/PendingReply.h"
+#include "client/ReplyTable.h"
 #include "platform/linux/messagepack/RpcFrame.h"
 #include "tonewerk/reporting.h"
 
@@ -31,5 +33,14 @@ class DecodedAnswer {
   std::string result_;
   std::vector<std::int64_t> reporterIDs_;
 };
+
+// One call of a caller's function that is to be made once no lock is held.
+struct Delivery {
+  PendingReply reply;
+  std::shared_ptr<DecodedAnswer> answer;
+  std::optional<twr_state> state;  // instead of an answer: the client's new state
+};
+
+using Deliveries = std::vector<Delivery>;
 
 }  // namespace tonewerk

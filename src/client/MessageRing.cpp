@@ -8,7 +8,7 @@
 #include <ctime>
 
 #include "client/MessageFrame.h"
-#include "client/PayloadFlags.h"
+#include "client/Payload.h"
 
 namespace tonewerk {
 namespace {

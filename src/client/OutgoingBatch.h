@@ -10,7 +10,7 @@
 #include <string_view>
 #include <vector>
 
-#include "client/Command.h"
+#include "client/CommandQueue.h"
 
 namespace tonewerk {
 

@@ -1,14 +1,15 @@
 // SPDX-License-Identifier: Apache-2.0
-// The payload functions of the C interface. They run on real-time threads: everything is written straight
-// into the caller's memory, and an entry counts only once it is whole.
+// The payload functions of the C interface run on real-time threads: everything is written straight into the
+// caller's memory, and an entry counts only once it is whole. What reads payloads does not, and allocates.
+#include "client/Payload.h"
+
 #include <cstring>
 #include <limits>
 #include <optional>
 #include <string_view>
 
-#include "client/PayloadFlags.h"
 #include "platform/linux/messagepack/RpcPacker.h"
-#include "tonewerk/reporting.h"
+#include "platform/linux/messagepack/RpcValueReader.h"
 #include "values/Utf8.h"
 
 namespace tonewerk {
@@ -119,7 +120,30 @@ void init(twr_payload* payload, void* memory, std::size_t size, std::uint32_t fl
   if (memory != nullptr) payload->capacity = static_cast<std::uint32_t>(size < kMax ? size : kMax);
 }
 
+std::string_view entriesOf(const twr_payload& payload) {
+  return {reinterpret_cast<const char*>(payload.bytes), payload.size};
+}
+
 }  // namespace
+
+void appendRequestBody(std::string& out, std::string_view method, const twr_payload* parameters) {
+  StringOutput output{out};
+  RpcPacker packer(output);
+  packer.text(method);
+  packer.pack_array(parameters == nullptr ? 0 : parameters->entries);
+  if (parameters != nullptr) out.append(entriesOf(*parameters));
+}
+
+std::optional<ValueMap> mapOf(const twr_payload& payload) {
+  std::string map;
+  StringOutput output{map};
+  RpcPacker(output).pack_map(payload.entries);
+  map.append(entriesOf(payload));
+  const std::optional<Value> read = readValue(map, ValuePlace::kArgument);
+  if (!read || read->asMap() == nullptr) return std::nullopt;
+  return *read->asMap();
+}
+
 }  // namespace tonewerk
 
 using tonewerk::Packer;

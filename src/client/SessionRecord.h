@@ -7,9 +7,8 @@
 #include <memory>
 #include <vector>
 
-#include "client/LossCount.h"
 #include "client/MessageRing.h"
-#include "client/PendingReply.h"
+#include "client/ReplyTable.h"
 #include "client/SessionState.h"
 #include "tonewerk/reporting.h"
 

@@ -14,12 +14,9 @@
 #include <sys/random.h>
 #include <utility>
 
-#include "client/ClientHandle.h"
 #include "client/ClientRegistry.h"
 #include "client/MessageFrame.h"
-#include "client/PayloadFlags.h"
-#include "client/RequestBody.h"
-#include "client/SocketPaths.h"
+#include "client/Payload.h"
 #include "platform/linux/messagepack/RpcLimits.h"
 #include "platform/linux/messagepack/RpcWriter.h"
 #include "protocol/Requests.h"
@@ -114,15 +111,6 @@ twr_status change(twr_session* session, SessionChange change, PendingReply reply
 }
 
 }  // namespace
-
-twr_client* makeClient(ClientSettings settings) {
-  if (!ClientThread::isCurrent()) clientRegistry::reapDetached();
-  const auto client = std::make_shared<twr_client>(std::move(settings));
-  client->engine.owner = client;
-  if (clientRegistry::add(client->engine)) return client.get();
-  client->engine.owner = nullptr;
-  return nullptr;
-}
 
 }  // namespace tonewerk
 

@@ -13,7 +13,7 @@
 #include <utility>
 #include <vector>
 
-#include "client/ClientHandle.h"
+#include "client/ClientRegistry.h"
 #include "client/ScriptedServer.h"
 #include "client/TestPayload.h"
 #include "support/TemporaryDirectory.h"

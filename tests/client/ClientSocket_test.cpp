@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "client/SocketPaths.h"
+#include "client/ClientSocket.h"
 
 #include <cstdlib>
 #include <gmock/gmock.h>
