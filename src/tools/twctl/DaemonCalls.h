@@ -8,6 +8,7 @@
 
 #include "tools/twctl/DaemonConnection.h"
 #include "tools/twctl/Tool.h"
+#include "values/Value.h"
 
 namespace tonewerk {
 
@@ -20,8 +21,6 @@ struct DaemonFailure {
 // A command's connection to the daemon. What goes wrong is printed and becomes the tool's exit status.
 class DaemonCalls {
  public:
-  using Answer = DaemonConnection::Answer;
-
   // `tool` outlives it.
   explicit DaemonCalls(Tool& tool) : tool_(tool) {}
 

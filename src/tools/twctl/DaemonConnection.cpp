@@ -47,10 +47,6 @@ std::error_code errorOf(twr_status status) {
 // What has arrived. The library's thread puts, the caller's takes.
 class DaemonConnection::Inbox {
  public:
-  struct Arrival {
-    AnswerHandler handler;
-    Answer answer;
-  };
   enum class Wait { kArrived, kGone, kTimedOut };
 
   Inbox() { event_.open(); }
@@ -200,34 +196,18 @@ std::error_code DaemonConnection::request(std::string_view method, const Argumen
   return library_->request(method, arguments, std::move(handler));
 }
 
-std::error_code DaemonConnection::processAnswers(milliseconds timeout) {
+std::error_code DaemonConnection::receive(milliseconds timeout) {
   if (!inbox_) return std::make_error_code(std::errc::not_connected);
   switch (inbox_->waitFor(timeout)) {
     case Inbox::Wait::kArrived:
-      for (const Inbox::Arrival& arrival : inbox_->takeAll()) {
-        if (arrival.handler) arrival.handler(arrival.answer);
-      }
+      for (Arrival& arrival : inbox_->takeAll()) arrive(std::move(arrival));
       return {};
     case Inbox::Wait::kGone:
       return std::make_error_code(std::errc::connection_reset);
     case Inbox::Wait::kTimedOut:
       break;
   }
-  return timeout > milliseconds::zero() ? std::make_error_code(std::errc::timed_out) : std::error_code();
-}
-
-std::optional<DaemonConnection::Answer> DaemonConnection::call(std::string_view method,
-                                                               const Arguments& arguments,
-                                                               milliseconds timeout, std::error_code& error) {
-  const auto until = std::chrono::steady_clock::now() + timeout;
-  // Shared, because after a time-out the answer may still come.
-  const auto answer = std::make_shared<std::optional<Answer>>();
-  error = request(method, arguments, [answer](const Answer& given) { *answer = given; });
-  while (!error && !answer->has_value()) {
-    const auto left = std::chrono::ceil<milliseconds>(until - std::chrono::steady_clock::now());
-    error = left > milliseconds::zero() ? processAnswers(left) : std::make_error_code(std::errc::timed_out);
-  }
-  return *answer;
+  return std::make_error_code(std::errc::timed_out);
 }
 
 }  // namespace tonewerk

@@ -66,7 +66,7 @@ std::error_code ReportingClient::connect(const std::vector<std::string>& paths) 
   disconnect();
   std::error_code error = std::make_error_code(std::errc::no_such_file_or_directory);
   for (const std::string& path : paths) {
-    auto connection = std::make_shared<Connection>();
+    auto connection = std::make_unique<Connection>();
     error = connection->socket.connect(path, sendTimeout_);
     if (error) continue;
     connection_ = std::move(connection);
@@ -76,7 +76,10 @@ std::error_code ReportingClient::connect(const std::vector<std::string>& paths) 
   return error;
 }
 
-void ReportingClient::disconnect() { connection_ = nullptr; }
+void ReportingClient::disconnect() {
+  connection_ = nullptr;
+  dropArrivals();
+}
 
 bool ReportingClient::isConnected() const { return connection_ != nullptr; }
 
@@ -111,35 +114,16 @@ std::error_code ReportingClient::send(std::string_view frame) {
   return error;
 }
 
-std::error_code ReportingClient::processAnswers(milliseconds timeout) {
-  const std::shared_ptr<Connection> connection = connection_;
-  if (!connection) return std::make_error_code(std::errc::not_connected);
-  std::deque<RpcFrame>& arrived = connection->socket.arrived();
-  const std::error_code error = connection->socket.receive(arrived.empty() ? timeout : milliseconds::zero());
-  const bool hasAnswers = !arrived.empty();
-  while (connection_ == connection && !arrived.empty()) {
-    RpcFrame frame = std::move(arrived.front());
-    arrived.pop_front();
-    auto waiting = connection->waiting.extract(frame.identifier);
-    if (!waiting.empty() && waiting.mapped()) waiting.mapped()(answerOf(frame));
+std::error_code ReportingClient::receive(milliseconds timeout) {
+  if (!connection_) return std::make_error_code(std::errc::not_connected);
+  const std::error_code error = connection_->socket.receive(timeout);
+  for (RpcFrame& frame : std::exchange(connection_->socket.arrived(), {})) {
+    auto waiting = connection_->waiting.extract(frame.identifier);
+    if (!waiting.empty()) arrive({std::move(waiting.mapped()), answerOf(frame)});
   }
-  if (hasAnswers || !error) return {};
-  if (error == std::errc::timed_out) return timeout > milliseconds::zero() ? error : std::error_code();
-  if (connection_ == connection) disconnect();
+  // The last answers are handed out before the connection fails.
+  if (error && error != std::errc::timed_out && !hasArrivals()) disconnect();
   return error;
-}
-
-std::optional<Answer> ReportingClient::call(std::string_view method, const Arguments& arguments,
-                                            milliseconds timeout, std::error_code& error) {
-  const auto until = std::chrono::steady_clock::now() + timeout;
-  // Shared, because after a time-out the answer may still come.
-  const auto answer = std::make_shared<std::optional<Answer>>();
-  error = request(method, arguments, [answer](const Answer& given) { *answer = given; });
-  while (!error && !answer->has_value()) {
-    const auto left = std::chrono::ceil<milliseconds>(until - std::chrono::steady_clock::now());
-    error = left > milliseconds::zero() ? processAnswers(left) : std::make_error_code(std::errc::timed_out);
-  }
-  return *answer;
 }
 
 Arguments ReportingClient::messageArguments(ValueMap message, std::uint32_t category, std::uint16_t type,

@@ -64,7 +64,7 @@ std::error_code RecordingPlayer::send(const RecordedCall& call) {
   const bool isStart = call.method == requests::kStartReportingSessionForID.name;
   const bool isKill = call.method == requests::kKillService.name;
   endsDaemon_ = endsDaemon_ || isKill;
-  const auto answered = [this, &call, isStart](const DaemonConnection::Answer& answer) {
+  const auto answered = [this, &call, isStart](const Answer& answer) {
     if (!isStart) --unanswered_;
     if (answer.error) refuse(call, DaemonCalls::describe(call.method, *answer.error));
   };
