@@ -92,7 +92,7 @@ class CompletionTest(unittest.TestCase):
         self.assertIn("HAL_Playback", self.offers("twctl", "send", "--category", "HAL_P"))
 
     def names_in_source(self, array):
-        text = (SOURCE / "src/session/TWReportingUtility.cpp").read_text()
+        text = (SOURCE / "src/protocol/EventTexts.cpp").read_text()
         found = re.search(rf"{array}{{(.*?)}};", text, re.DOTALL)
         return re.findall(r'"(\w+)"', found.group(1))
 
