@@ -3,6 +3,7 @@
 
 #include <fstream>
 #include <gtest/gtest.h>
+#include <initializer_list>
 #include <string>
 
 #include "support/TemporaryDirectory.h"
@@ -27,7 +28,8 @@ class RegularFileTest : public testing::Test {
 TEST_F(RegularFileTest, ReadsTheSameWhateverIsExpected) {
   const std::string text(10'000, 'a');
   std::ofstream(path_) << text;
-  for (const std::size_t expected : {0, 1, 9'999, 10'000, 10'001, 1'000'000}) {
+  for (const std::size_t expected :
+       std::initializer_list<std::size_t>{0, 1, 9'999, 10'000, 10'001, 1'000'000}) {
     EXPECT_FALSE(read(expected, text.size()));
     EXPECT_EQ(bytes_, text) << expected;
   }
@@ -35,7 +37,7 @@ TEST_F(RegularFileTest, ReadsTheSameWhateverIsExpected) {
 
 TEST_F(RegularFileTest, SaysThatThereIsMoreThanItMayRead) {
   std::ofstream(path_) << std::string(10'000, 'a');
-  for (const std::size_t expected : {0, 9'999, 10'000}) {
+  for (const std::size_t expected : std::initializer_list<std::size_t>{0, 9'999, 10'000}) {
     EXPECT_EQ(read(expected, 9'999), std::errc::file_too_large) << expected;
   }
 }
