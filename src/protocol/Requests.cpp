@@ -4,11 +4,7 @@
 namespace tonewerk::requests {
 
 const RequestSet& all() {
-  static const RequestSet set{{kCreateReportingSession, kSetServiceType, kGetServiceNameForReporterID,
-                               kSetConfiguration, kStartReportingSessionForID, kSendMessage,
-                               kStopReportingSessionForID, kDestroyReportingSession, kReporterIDValid,
-                               kGetAllReporters, kKillService, kObserve, kWatchSessions, kWatchOpenMessages,
-                               kWatchNextMessages}};
+  static const RequestSet set{{kAll.begin(), kAll.end()}};
   return set;
 }
 

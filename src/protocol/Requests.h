@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <array>
 #include <cstddef>
 #include <string_view>
 
@@ -81,6 +82,21 @@ inline constexpr Method kWatchNextMessages{.name = "watch.nextMessages",
                                            .forOwner = true};
 
 // All of them, in the order in which they are listed to people.
+inline constexpr std::array kAll{kCreateReportingSession,
+                                 kSetServiceType,
+                                 kGetServiceNameForReporterID,
+                                 kSetConfiguration,
+                                 kStartReportingSessionForID,
+                                 kSendMessage,
+                                 kStopReportingSessionForID,
+                                 kDestroyReportingSession,
+                                 kReporterIDValid,
+                                 kGetAllReporters,
+                                 kKillService,
+                                 kObserve,
+                                 kWatchSessions,
+                                 kWatchOpenMessages,
+                                 kWatchNextMessages};
 const RequestSet& all();
 
 }  // namespace requests

@@ -2,7 +2,8 @@
 #include "service/TWReportingServiceExport.h"
 
 #include <algorithm>
-#include <cassert>
+#include <array>
+#include <cstddef>
 #include <iterator>
 #include <string>
 #include <string_view>
@@ -59,7 +60,7 @@ struct Handler {
   void (*run)(const Targets& to, Incoming& in);
 };
 
-const Handler kHandlers[] = {
+constexpr Handler kHandlers[] = {
     {requests::kCreateReportingSession.name,
      [](const Targets& to, Incoming& in) {
        to.service.createReportingSession(reporterIDOf(in.arguments[0]), in.request());
@@ -111,20 +112,25 @@ const Handler kHandlers[] = {
      }},
 };
 
-// The handlers in the order of requests::all().
-const std::vector<const Handler*>& handlers() {
-  static const std::vector<const Handler*> inOrder = [] {
-    std::vector<const Handler*> found;
-    for (const Method& method : requests::all().methods) {
-      const auto* handler = std::find_if(std::begin(kHandlers), std::end(kHandlers),
-                                         [&](const Handler& each) { return each.name == method.name; });
-      assert(handler != std::end(kHandlers));
-      found.push_back(handler);
-    }
-    return found;
-  }();
-  return inOrder;
+constexpr std::size_t kNoHandler = std::size(kHandlers);
+
+// Where the handler of a request stands; kNoHandler when it has none.
+constexpr std::size_t handlerOf(const Method& method) {
+  for (std::size_t at = 0; at < std::size(kHandlers); ++at) {
+    if (kHandlers[at].name == method.name) return at;
+  }
+  return kNoHandler;
 }
+
+// The handlers in the order of requests::kAll.
+constexpr auto kHandlerOf = [] {
+  std::array<std::size_t, requests::kAll.size()> places{};
+  for (std::size_t at = 0; at < places.size(); ++at) places[at] = handlerOf(requests::kAll[at]);
+  return places;
+}();
+static_assert(std::find(kHandlerOf.begin(), kHandlerOf.end(), kNoHandler) == kHandlerOf.end(),
+              "a request has no handler");
+static_assert(std::size(kHandlers) == requests::kAll.size(), "a handler has no request");
 
 }  // namespace
 
@@ -151,9 +157,9 @@ std::optional<ReplyError> TWReportingServiceExport::takeRole(const Method& metho
 
 void TWReportingServiceExport::handleRequest(std::size_t method, Arguments arguments, Reply reply,
                                              InFlightToken token) {
-  if (const std::optional<ReplyError> error = takeRole(requests::all().methods[method])) return reply(error);
+  if (const std::optional<ReplyError> error = takeRole(requests::kAll[method])) return reply(error);
   Incoming incoming{std::move(arguments), std::move(reply), std::move(token)};
-  handlers()[method]->run({*object_, *watch_}, incoming);
+  kHandlers[kHandlerOf[method]].run({*object_, *watch_}, incoming);
 }
 
 }  // namespace tonewerk
