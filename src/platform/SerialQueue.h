@@ -26,6 +26,10 @@ class SerialQueue {
   // True on the thread that is running this queue's work.
   virtual bool isCurrent() const = 0;
 
+  // True where objects that live on this queue may be used. That is the queue's own work; a queue without a thread
+  // of its own, as in tests, also admits the thread that made it. For assertions.
+  virtual bool ownsThisThread() const { return isCurrent(); }
+
   virtual const std::string& name() const = 0;
 };
 

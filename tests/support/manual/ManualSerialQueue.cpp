@@ -12,7 +12,7 @@ ManualSerialQueue::~ManualSerialQueue() {
 }
 
 void ManualSerialQueue::async(Task work) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   pending_.push_back(std::move(work));
 }
 
@@ -22,7 +22,7 @@ std::size_t ManualSerialQueue::runAll() {
   for (;;) {
     std::vector<Task> batch;
     {
-      const std::lock_guard lock(mutex_);
+      const MutexLock lock(mutex_);
       batch.swap(pending_);
     }
     if (batch.empty()) return count;
@@ -37,7 +37,7 @@ std::size_t ManualSerialQueue::runAll() {
 }
 
 std::size_t ManualSerialQueue::pendingCount() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return pending_.size();
 }
 

@@ -4,12 +4,12 @@
 #include <atomic>
 #include <cstddef>
 #include <functional>
-#include <mutex>
 #include <string>
 #include <thread>
 #include <vector>
 
 #include "platform/SerialQueue.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -31,6 +31,8 @@ class ManualSerialQueue final : public SerialQueue {
   void async(Task work) override;
   void drain() override { runAll(); }
   bool isCurrent() const override { return runner_.load() == std::this_thread::get_id(); }
+  // Also the thread that made the queue: tests call what lives on it directly.
+  bool ownsThisThread() const override { return isCurrent() || std::this_thread::get_id() == maker_; }
   const std::string& name() const override { return name_; }
 
   // Runs until nothing waits; how many pieces ran. Not from the queue's own work.
@@ -44,8 +46,9 @@ class ManualSerialQueue final : public SerialQueue {
  private:
   const std::string name_;
   const QueuePriority priority_;
-  mutable std::mutex mutex_;
-  std::vector<Task> pending_;  // guarded by mutex_
+  const std::thread::id maker_ = std::this_thread::get_id();
+  mutable Mutex mutex_;
+  std::vector<Task> pending_ GUARDED_BY(mutex_);
   std::atomic<std::thread::id> runner_{};
   std::function<void()> onDestruction_;
 };
