@@ -52,7 +52,7 @@ class InstalledLibraryTest : public testing::Test {
   }
   static std::string sanitize() {
     const std::string sanitizers = TONEWERK_SANITIZE;
-    return sanitizers.empty() ? "" : " -fsanitize=" + sanitizers;
+    return sanitizers.empty() ? "" : " -fsanitize=" + sanitizers + " " TONEWERK_SANITIZE_C;
   }
   static std::string libraryDirectory(const std::string& where) {
     for (const auto& entry : std::filesystem::recursive_directory_iterator(where))

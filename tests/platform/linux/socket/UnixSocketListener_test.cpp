@@ -2,6 +2,7 @@
 #include "platform/linux/socket/UnixSocketListener.h"
 
 #include <atomic>
+#include <cerrno>
 #include <chrono>
 #include <cstdint>
 #include <fcntl.h>
@@ -14,6 +15,7 @@
 #include <sys/file.h>
 #include <sys/resource.h>
 #include <sys/stat.h>
+#include <system_error>
 #include <thread>
 #include <unistd.h>
 #include <vector>
@@ -607,8 +609,9 @@ TEST_F(FewDescriptorsTest, PausesWhenTheSystemHasNoDescriptorAndSaysSoOnce) {
   UnixSocketListener listener(ServerSocket::open(path, problem), category);
   listener.setDelegate(delegate);
   listener.resume();
-  // A client's whole life beforehand: without descriptors the sanitizer cannot look at an object's type, and
-  // takes those it has not seen before for broken.
+  // A client's whole life and an error's text beforehand: without descriptors the sanitizer cannot look at an object's
+  // type, and takes those it has not seen before for broken.
+  EXPECT_FALSE(std::generic_category().message(EMFILE).empty());
   {
     RawClient early(path);
     ASSERT_TRUE(early.send(requestOf(1, "takeInt64", {Value(1)})));
