@@ -25,14 +25,14 @@ bool NotificationHandlers::isName(std::string_view name) {
 }
 
 NotificationHandlers::~NotificationHandlers() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   for (const auto& [token, registration] : registrations_) registration->isCancelled = true;
 }
 
 NotificationHandlers::Token NotificationHandlers::add(std::string_view name, SerialQueue& queue,
                                                       Handler handler) {
   auto registration = std::make_shared<Registration>(name, queue, std::move(handler));
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   do {
     lastToken_ = lastToken_ == std::numeric_limits<Token>::max() ? 1 : lastToken_ + 1;
   } while (registrations_.count(lastToken_) != 0);
@@ -41,14 +41,14 @@ NotificationHandlers::Token NotificationHandlers::add(std::string_view name, Ser
 }
 
 std::optional<std::string> NotificationHandlers::nameOf(Token token) const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   const auto found = registrations_.find(token);
   return found == registrations_.end() ? std::nullopt : std::optional(found->second->name);
 }
 
 void NotificationHandlers::remove(Token token) {
   std::shared_ptr<Registration> removed;  // ends after the lock: what the handler holds may use this object
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   const auto found = registrations_.find(token);
   if (found == registrations_.end()) return;
   removed = std::move(found->second);
@@ -57,18 +57,18 @@ void NotificationHandlers::remove(Token token) {
 }
 
 void NotificationHandlers::tell(std::string_view name) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   for (const auto& [token, registration] : registrations_) {
     if (registration->name == name) queue(token, registration);
   }
 }
 
 void NotificationHandlers::tellAll() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   for (const auto& [token, registration] : registrations_) queue(token, registration);
 }
 
-// Under the lock, so that nothing reaches a queue after remove() has returned.
+// Holds the lock, so that nothing reaches a queue after remove() has returned.
 void NotificationHandlers::queue(Token token, const std::shared_ptr<Registration>& registration) {
   if (registration->isQueued.exchange(true)) return;
   registration->queue.async([token, registration] {

@@ -4,12 +4,12 @@
 #include <functional>
 #include <map>
 #include <memory>
-#include <mutex>
 #include <optional>
 #include <string>
 #include <string_view>
 
 #include "platform/NotificationService.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -46,11 +46,11 @@ class NotificationHandlers {
 
  private:
   struct Registration;
-  static void queue(Token token, const std::shared_ptr<Registration>& registration);
+  void queue(Token token, const std::shared_ptr<Registration>& registration) REQUIRES(mutex_);
 
-  mutable std::mutex mutex_;  // guards the two below; held while a handler is queued, never while it runs
-  Token lastToken_ = 0;
-  std::map<Token, std::shared_ptr<Registration>> registrations_;
+  mutable Mutex mutex_;  // held while a handler is queued, never while one runs
+  Token lastToken_ GUARDED_BY(mutex_) = 0;
+  std::map<Token, std::shared_ptr<Registration>> registrations_ GUARDED_BY(mutex_);
 };
 
 }  // namespace tonewerk

@@ -121,17 +121,20 @@ std::string OtlpReceiver::deadAddress() {
 }
 
 void OtlpReceiver::answerNext(Answer answer) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   answers_.push_back(std::move(answer));
 }
 
 bool OtlpReceiver::waitForRequests(std::size_t count) {
-  std::unique_lock lock(mutex_);
-  return arrived_.wait_for(lock, kPatience, [&] { return requests_.size() >= count; });
+  const auto end = std::chrono::steady_clock::now() + kPatience;
+  MutexLock lock(mutex_);
+  while (requests_.size() < count && arrived_.waitUntil(lock, end)) {
+  }
+  return requests_.size() >= count;
 }
 
 std::vector<OtlpReceiver::Request> OtlpReceiver::requests() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return requests_;
 }
 
@@ -149,7 +152,7 @@ std::vector<nlohmann::json> OtlpReceiver::records() const {
 }
 
 std::vector<std::string> OtlpReceiver::problems() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return problems_;
 }
 
@@ -168,13 +171,13 @@ void OtlpReceiver::serve(int connection) {
   check(request);
   Answer answer;
   {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     requests_.push_back(std::move(request));
     if (!answers_.empty()) {
       answer = std::move(answers_.front());
       answers_.pop_front();
     }
-    arrived_.notify_all();
+    arrived_.notifyAll();
   }
   send(connection, answer);
 }
@@ -213,7 +216,7 @@ void OtlpReceiver::check(Request& request) {
   }
   const std::vector<std::string> schema = problemsOfOtlpLogs(request.body);
   found.insert(found.end(), schema.begin(), schema.end());
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   problems_.insert(problems_.end(), found.begin(), found.end());
 }
 

@@ -1,15 +1,15 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <condition_variable>
 #include <cstddef>
 #include <deque>
 #include <map>
-#include <mutex>
 #include <nlohmann/json.hpp>
 #include <string>
 #include <thread>
 #include <vector>
+
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -83,12 +83,11 @@ class OtlpReceiver {
   int wakeRead_ = -1;
   int wakeWrite_ = -1;
 
-  mutable std::mutex mutex_;
-  std::condition_variable arrived_;
-  // Guarded by mutex_.
-  std::deque<Answer> answers_;
-  std::vector<Request> requests_;
-  std::vector<std::string> problems_;
+  mutable Mutex mutex_;
+  Condition arrived_;
+  std::deque<Answer> answers_ GUARDED_BY(mutex_);
+  std::vector<Request> requests_ GUARDED_BY(mutex_);
+  std::vector<std::string> problems_ GUARDED_BY(mutex_);
 
   std::thread thread_;  // last: it uses all above
 };

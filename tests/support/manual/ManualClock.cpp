@@ -14,18 +14,18 @@ double secondsOf(std::chrono::nanoseconds duration) {
 }  // namespace
 
 double ManualClock::now() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   ++wallReads_;
   return wallAtZero_ + secondsOf(monotonic_);
 }
 
 std::chrono::nanoseconds ManualClock::monotonic() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return monotonic_;
 }
 
 std::chrono::minutes ManualClock::utcOffset(double) const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return utcOffset_;
 }
 
@@ -56,17 +56,17 @@ void ManualClock::advance(double seconds) {
 }
 
 void ManualClock::setNow(double seconds) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   wallAtZero_ = seconds - secondsOf(monotonic_);
 }
 
 void ManualClock::setUtcOffset(std::chrono::minutes offset) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   utcOffset_ = offset;
 }
 
 std::uint64_t ManualClock::wallReads() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return wallReads_;
 }
 
@@ -86,7 +86,7 @@ ManualClock::Alarm* ManualClock::earliestUntil(std::chrono::nanoseconds end) con
 }
 
 void ManualClock::moveTo(std::chrono::nanoseconds monotonic) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   monotonic_ = monotonic;
 }
 

@@ -4,11 +4,11 @@
 #include <chrono>
 #include <cstdint>
 #include <functional>
-#include <mutex>
 #include <optional>
 #include <vector>
 
 #include "platform/Clock.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -61,11 +61,11 @@ class ManualClock final : public Clock {
   Alarm* earliestUntil(std::chrono::nanoseconds end) const;
   void moveTo(std::chrono::nanoseconds monotonic);
 
-  mutable std::mutex mutex_;  // guards the three times and the count
-  mutable std::uint64_t wallReads_ = 0;
-  double wallAtZero_;  // wall-clock time when monotonic time was 0
-  std::chrono::nanoseconds monotonic_{0};
-  std::chrono::minutes utcOffset_{0};
+  mutable Mutex mutex_;
+  mutable std::uint64_t wallReads_ GUARDED_BY(mutex_) = 0;
+  double wallAtZero_ GUARDED_BY(mutex_);  // wall-clock time when monotonic time was 0
+  std::chrono::nanoseconds monotonic_ GUARDED_BY(mutex_){0};
+  std::chrono::minutes utcOffset_ GUARDED_BY(mutex_){0};
   std::vector<Alarm*> alarms_;
 };
 

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "support/manual/ManualSemaphores.h"
 
-#include <mutex>
+#include "values/Mutex.h"
 
 namespace tonewerk {
 namespace {
@@ -11,7 +11,7 @@ class ManualSemaphore final : public Semaphore {
   explicit ManualSemaphore(ManualClock& clock) : clock_(clock) {}
 
   void signal() override {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     ++count_;
   }
 
@@ -21,15 +21,15 @@ class ManualSemaphore final : public Semaphore {
 
  private:
   bool take() {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     if (count_ == 0) return false;
     --count_;
     return true;
   }
 
   ManualClock& clock_;
-  std::mutex mutex_;
-  int count_ = 0;  // guarded by mutex_
+  Mutex mutex_;
+  int count_ GUARDED_BY(mutex_) = 0;
 };
 
 }  // namespace

@@ -16,20 +16,20 @@ class ManualTimers::ManualTimer final : public Timer {
 std::unique_ptr<Timer> ManualTimers::repeat(std::chrono::milliseconds interval, std::function<void()> tick) {
   assert(interval.count() > 0);
   auto entry = std::make_shared<Entry>(Entry{interval, clock_.monotonic() + interval, std::move(tick)});
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   entries_.push_back(entry);
   return std::make_unique<ManualTimer>(std::move(entry));
 }
 
 std::size_t ManualTimers::count() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   std::size_t alive = 0;
   for (const auto& entry : entries_) alive += entry.expired() ? 0 : 1;
   return alive;
 }
 
 std::optional<std::chrono::nanoseconds> ManualTimers::nextDue() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   if (isTicking_) return std::nullopt;  // a tick moves the clock
   const std::shared_ptr<Entry> next = earliest();
   return next == nullptr ? std::nullopt : std::optional(next->due);
@@ -38,7 +38,7 @@ std::optional<std::chrono::nanoseconds> ManualTimers::nextDue() const {
 void ManualTimers::runNext() {
   std::shared_ptr<Entry> entry;  // keeps the tick alive while it runs, also when it destroys its timer
   {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     std::erase_if(entries_, [](const auto& held) { return held.expired(); });
     entry = earliest();
     if (entry == nullptr) return;
@@ -48,7 +48,7 @@ void ManualTimers::runNext() {
     isTicking_ = true;
   }
   entry->tick();
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   isTicking_ = false;
 }
 

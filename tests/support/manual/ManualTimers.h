@@ -3,11 +3,11 @@
 
 #include <cstddef>
 #include <memory>
-#include <mutex>
 #include <vector>
 
 #include "platform/TimerService.h"
 #include "support/manual/ManualClock.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -44,12 +44,12 @@ class ManualTimers final : public TimerService, private ManualClock::Alarm {
 
   std::optional<std::chrono::nanoseconds> nextDue() const override;
   void runNext() override;
-  std::shared_ptr<Entry> earliest() const;
+  std::shared_ptr<Entry> earliest() const REQUIRES(mutex_);
 
   ManualClock& clock_;
-  mutable std::mutex mutex_;                   // guards all below
-  bool isTicking_ = false;                     // no tick runs inside another
-  std::vector<std::weak_ptr<Entry>> entries_;  // a timer owns its entry
+  mutable Mutex mutex_;
+  bool isTicking_ GUARDED_BY(mutex_) = false;                     // no tick runs inside another
+  std::vector<std::weak_ptr<Entry>> entries_ GUARDED_BY(mutex_);  // a timer owns its entry
 };
 
 }  // namespace tonewerk

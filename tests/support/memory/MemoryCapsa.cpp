@@ -1,19 +1,20 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "support/memory/MemoryCapsa.h"
 
-#include <mutex>
 #include <utility>
+
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
 struct MemoryCapsa::State {
-  mutable std::mutex mutex;  // guards all below
-  std::vector<Request> requests;
-  std::vector<std::string> cancelled;
-  std::size_t reporterCount = 0;
-  bool accepts = true;
-  bool answersAtOnce = false;
-  ReplyMap reply;
+  Mutex mutex;
+  std::vector<Request> requests GUARDED_BY(mutex);
+  std::vector<std::string> cancelled GUARDED_BY(mutex);
+  std::size_t reporterCount GUARDED_BY(mutex) = 0;
+  bool accepts GUARDED_BY(mutex) = true;
+  bool answersAtOnce GUARDED_BY(mutex) = false;
+  ReplyMap reply GUARDED_BY(mutex);
 };
 
 class MemoryCapsa::MemoryReporter final : public FaultsignReporter {
@@ -43,7 +44,7 @@ class MemoryCapsa::MemoryReporter final : public FaultsignReporter {
   }
 
   void cancelSession(const std::string& identifier) override {
-    const std::lock_guard lock(state_->mutex);
+    const MutexLock lock(state_->mutex);
     state_->cancelled.push_back(identifier);
   }
 
@@ -51,7 +52,7 @@ class MemoryCapsa::MemoryReporter final : public FaultsignReporter {
   bool take(const Request& request) {
     ReplyMap reply;
     {
-      const std::lock_guard lock(state_->mutex);
+      const MutexLock lock(state_->mutex);
       state_->requests.push_back(request);
       if (!state_->accepts) return false;
       if (!state_->answersAtOnce) return true;
@@ -68,18 +69,18 @@ MemoryCapsa::MemoryCapsa() : state_(std::make_shared<State>()) {}
 MemoryCapsa::~MemoryCapsa() { refuse(); }
 
 std::unique_ptr<FaultsignReporter> MemoryCapsa::makeReporter() {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   ++state_->reporterCount;
   return std::make_unique<MemoryReporter>(state_);
 }
 
 void MemoryCapsa::refuse() {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   state_->accepts = false;
 }
 
 void MemoryCapsa::answerAtOnce(ReplyMap reply) {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   state_->answersAtOnce = true;
   state_->reply = std::move(reply);
 }
@@ -96,17 +97,17 @@ MemoryCapsa::ReplyMap MemoryCapsa::failed(FaultsignError reason) {
 }
 
 std::vector<MemoryCapsa::Request> MemoryCapsa::requests() const {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   return state_->requests;
 }
 
 std::vector<std::string> MemoryCapsa::cancelled() const {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   return state_->cancelled;
 }
 
 std::size_t MemoryCapsa::reporterCount() const {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   return state_->reporterCount;
 }
 

@@ -17,7 +17,7 @@ std::string textOf(const MemoryChanmeter::Group& group) {
 }  // namespace
 
 void MemoryChanmeter::setRecords(std::vector<ChanmeterRecord> records) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   records_.clear();
   for (ChanmeterRecord& record : records) {
     records_.push_back(std::make_shared<const ChanmeterRecord>(std::move(record)));
@@ -25,27 +25,27 @@ void MemoryChanmeter::setRecords(std::vector<ChanmeterRecord> records) {
 }
 
 void MemoryChanmeter::fail(Operation operation, Failure failure, std::optional<Group> onlyOf) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   rules_.push_back({operation, failure, std::move(onlyOf)});
 }
 
 void MemoryChanmeter::failNoMore() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   rules_.clear();
 }
 
 std::vector<std::string> MemoryChanmeter::calls() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return calls_;
 }
 
 void MemoryChanmeter::forgetCalls() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   calls_.clear();
 }
 
 std::size_t MemoryChanmeter::heldSamples() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   const auto held =
       std::count_if(samples_.begin(), samples_.end(), [](const auto& samples) { return !samples.expired(); });
   return static_cast<std::size_t>(held);
@@ -73,7 +73,7 @@ bool MemoryChanmeter::fails(Operation operation, const Group& group,
 Chanmeter::Channels MemoryChanmeter::copyChannelsInGroup(const std::optional<std::string>& group,
                                                          const std::optional<std::string>& subGroup,
                                                          std::optional<ChanmeterError>& error) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   const Group asked{group, subGroup};
   note("copyChannelsInGroup", asked);
   if (fails(Operation::kCopyChannels, asked, error)) return nullptr;
@@ -84,7 +84,7 @@ Chanmeter::Channels MemoryChanmeter::copyChannelsInGroup(const std::optional<std
 
 Chanmeter::Subscription MemoryChanmeter::createSubscription(const Channels& channels, Channels& subscribed,
                                                             std::optional<ChanmeterError>& error) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   const Group group = groups_.at(channels);
   note("createSubscription", group);
   if (fails(Operation::kCreateSubscription, group, error)) return nullptr;
@@ -98,7 +98,7 @@ Chanmeter::Subscription MemoryChanmeter::createSubscription(const Channels& chan
 Chanmeter::Samples MemoryChanmeter::createSamples(const Subscription& subscription,
                                                   const Channels& subscribed,
                                                   std::optional<ChanmeterError>& error) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   const Group group = groups_.at(subscription);
   note("createSamples", group);
   if (fails(Operation::kCreateSamples, group, error)) return nullptr;
@@ -108,7 +108,7 @@ Chanmeter::Samples MemoryChanmeter::createSamples(const Subscription& subscripti
 
 Chanmeter::Samples MemoryChanmeter::createSamplesDelta(const Samples& earlier, const Samples& later,
                                                        std::optional<ChanmeterError>& error) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   const Group group = groups_.at(later);
   note("createSamplesDelta", group);
   if (fails(Operation::kCreateSamplesDelta, group, error)) return nullptr;

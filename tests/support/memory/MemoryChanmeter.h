@@ -4,13 +4,13 @@
 #include <cstdint>
 #include <map>
 #include <memory>
-#include <mutex>
 #include <optional>
 #include <string>
 #include <vector>
 
 #include "platform/chanmeter/ChanmeterRecord.h"
 #include "platform/chanmeter/RecordChanmeter.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -68,20 +68,21 @@ class MemoryChanmeter final : public RecordChanmeter {
     std::optional<Group> onlyOf;
   };
 
-  void note(const std::string& operation, const Group& group);
+  void note(const std::string& operation, const Group& group) REQUIRES(mutex_);
   // Null when the operation is to succeed.
-  const Failure* failureOf(Operation operation, const Group& group) const;
+  const Failure* failureOf(Operation operation, const Group& group) const REQUIRES(mutex_);
   // Fills `error`; whether the result is to be withheld.
-  bool fails(Operation operation, const Group& group, std::optional<ChanmeterError>& error) const;
-  Samples remembered(Samples samples, const Group& group);
+  bool fails(Operation operation, const Group& group, std::optional<ChanmeterError>& error) const
+      REQUIRES(mutex_);
+  Samples remembered(Samples samples, const Group& group) REQUIRES(mutex_);
 
-  mutable std::mutex mutex_;  // guards all below
-  ChanmeterRecords records_;
-  std::vector<Rule> rules_;
-  std::vector<std::string> calls_;
+  mutable Mutex mutex_;
+  ChanmeterRecords records_ GUARDED_BY(mutex_);
+  std::vector<Rule> rules_ GUARDED_BY(mutex_);
+  std::vector<std::string> calls_ GUARDED_BY(mutex_);
   // What was handed out, and for which group.
-  std::map<std::weak_ptr<const void>, Group, std::owner_less<>> groups_;
-  std::vector<std::weak_ptr<const ChanmeterSamples>> samples_;
+  std::map<std::weak_ptr<const void>, Group, std::owner_less<>> groups_ GUARDED_BY(mutex_);
+  std::vector<std::weak_ptr<const ChanmeterSamples>> samples_ GUARDED_BY(mutex_);
 };
 
 }  // namespace tonewerk

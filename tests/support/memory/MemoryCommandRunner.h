@@ -1,14 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <condition_variable>
 #include <map>
-#include <mutex>
 #include <set>
 #include <string>
 #include <vector>
 
 #include "platform/CommandRunner.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -39,11 +38,11 @@ class MemoryCommandRunner final : public CommandRunner {
   void awaitRuns(std::size_t count);
 
  private:
-  mutable std::mutex mutex_;  // guards what follows
-  std::condition_variable changed_;
-  std::map<std::string, Result> answers_;
-  std::set<std::string> held_;
-  std::vector<Run> runs_;
+  mutable Mutex mutex_;
+  Condition changed_;
+  std::map<std::string, Result> answers_ GUARDED_BY(mutex_);
+  std::set<std::string> held_ GUARDED_BY(mutex_);
+  std::vector<Run> runs_ GUARDED_BY(mutex_);
 };
 
 }  // namespace tonewerk

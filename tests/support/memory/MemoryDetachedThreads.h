@@ -2,13 +2,13 @@
 #pragma once
 
 #include <map>
-#include <mutex>
 #include <string>
 #include <system_error>
 #include <thread>
 #include <vector>
 
 #include "platform/DetachedThreads.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -26,7 +26,7 @@ class MemoryDetachedThreads final : public DetachedThreads {
   }
 
   std::error_code start(std::string_view name, Task work) override {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     if (const auto refusal = refusals_.find(name); refusal != refusals_.end()) {
       return std::make_error_code(refusal->second);
     }
@@ -37,20 +37,20 @@ class MemoryDetachedThreads final : public DetachedThreads {
 
   // From now on no thread of that name can be started.
   void refuse(const std::string& name, std::errc error) {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     refusals_[name] = error;
   }
   // The names of those that were started, in order.
   std::vector<std::string> started() const {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     return started_;
   }
 
  private:
-  mutable std::mutex mutex_;  // guards what follows
-  std::map<std::string, std::errc, std::less<>> refusals_;
-  std::vector<std::string> started_;
-  std::vector<std::thread> threads_;
+  mutable Mutex mutex_;
+  std::map<std::string, std::errc, std::less<>> refusals_ GUARDED_BY(mutex_);
+  std::vector<std::string> started_ GUARDED_BY(mutex_);
+  std::vector<std::thread> threads_ GUARDED_BY(mutex_);
 };
 
 }  // namespace tonewerk

@@ -26,12 +26,12 @@ class FieldList final : public PB::Writer {
 void MemoryDiagwire::post(std::uint32_t metricIdentifier, const PB::Base& record) {
   FieldList list;
   record.writeTo(list);
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   posts_.push_back({metricIdentifier, std::move(list.fields)});
 }
 
 std::vector<MemoryDiagwire::Post> MemoryDiagwire::posts() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return posts_;
 }
 

@@ -2,11 +2,11 @@
 #pragma once
 
 #include <cstdint>
-#include <mutex>
 #include <string>
 #include <vector>
 
 #include "platform/Diagwire.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -27,8 +27,8 @@ class MemoryDiagwire final : public Diagwire {
   std::vector<Post> posts() const;
 
  private:
-  mutable std::mutex mutex_;
-  std::vector<Post> posts_;  // guarded by mutex_
+  mutable Mutex mutex_;
+  std::vector<Post> posts_ GUARDED_BY(mutex_);
 };
 
 }  // namespace tonewerk

@@ -6,12 +6,12 @@
 namespace tonewerk {
 
 void MemoryEnergybook::sendEvent(std::int32_t group, const SharedString& name, ValueMap payload) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   events_.push_back({group, name.string(), std::move(payload)});
 }
 
 std::vector<MemoryEnergybook::Event> MemoryEnergybook::events() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return events_;
 }
 

@@ -2,11 +2,11 @@
 #pragma once
 
 #include <cstdint>
-#include <mutex>
 #include <string>
 #include <vector>
 
 #include "platform/Energybook.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -28,8 +28,8 @@ class MemoryEnergybook final : public Energybook {
   std::vector<Event> events() const;
 
  private:
-  mutable std::mutex mutex_;
-  std::vector<Event> events_;  // guarded by mutex_
+  mutable Mutex mutex_;
+  std::vector<Event> events_ GUARDED_BY(mutex_);
 };
 
 }  // namespace tonewerk

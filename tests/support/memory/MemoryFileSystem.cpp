@@ -23,12 +23,12 @@ class MemoryFileSystem::File final : public NewFile {
   File(const File&) = delete;
   File& operator=(const File&) = delete;
   ~File() override {
-    const std::lock_guard lock(state_->mutex);
+    const MutexLock lock(state_->mutex);
     if (!isPlaced_) --state_->openFiles;
   }
 
   std::error_code write(std::string_view text) override {
-    const std::lock_guard lock(state_->mutex);
+    const MutexLock lock(state_->mutex);
     assert(!isPlaced_);
     if (state_->writesUntilFailure > 0 && --state_->writesUntilFailure == 0) {
       if (!failure_) failure_ = std::make_error_code(state_->writeFailure);
@@ -39,7 +39,7 @@ class MemoryFileSystem::File final : public NewFile {
   }
 
   std::error_code place(const std::string& name) override {
-    const std::lock_guard lock(state_->mutex);
+    const MutexLock lock(state_->mutex);
     assert(!isPlaced_);
     if (!isPlainName(name)) return std::make_error_code(std::errc::invalid_argument);
     if (failure_) return failure_;
@@ -63,7 +63,7 @@ class MemoryFileSystem::File final : public NewFile {
 MemoryFileSystem::MemoryFileSystem() : state_(std::make_shared<State>()) { state_->directories["/"] = 0755; }
 
 std::error_code MemoryFileSystem::createDirectories(const std::string& path, unsigned mode) {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   if (state_->createDirectoriesFailure != std::errc()) {
     return std::make_error_code(state_->createDirectoriesFailure);
   }
@@ -77,7 +77,7 @@ std::error_code MemoryFileSystem::createDirectories(const std::string& path, uns
 
 std::unique_ptr<NewFile> MemoryFileSystem::createFile(const std::string& directory, const std::string& name,
                                                       std::error_code& error) {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   error.clear();
   if (state_->createFileFailure != std::errc()) {
     error = std::make_error_code(state_->createFileFailure);
@@ -96,12 +96,12 @@ std::unique_ptr<NewFile> MemoryFileSystem::createFile(const std::string& directo
 }
 
 bool MemoryFileSystem::exists(const std::string& path) const {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   return state_->holds(path);
 }
 
 std::error_code MemoryFileSystem::readFile(const std::string& path, std::string& text) const {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   if (state_->readFailure != std::errc()) return std::make_error_code(state_->readFailure);
   if (state_->directories.contains(path)) return std::make_error_code(std::errc::is_a_directory);
   const auto found = state_->files.find(path);
@@ -112,7 +112,7 @@ std::error_code MemoryFileSystem::readFile(const std::string& path, std::string&
 
 std::error_code MemoryFileSystem::moveFile(const std::string& from, const std::string& directory,
                                            const std::string& name) {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   if (state_->moveFailure != std::errc()) return std::make_error_code(state_->moveFailure);
   if (!isPlainName(name)) return std::make_error_code(std::errc::invalid_argument);
   if (state_->directories.contains(from) || state_->links.contains(from)) {
@@ -129,68 +129,68 @@ std::error_code MemoryFileSystem::moveFile(const std::string& from, const std::s
 }
 
 void MemoryFileSystem::failCreateDirectories(std::errc error) {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   state_->createDirectoriesFailure = error;
 }
 
 void MemoryFileSystem::failCreateFile(std::errc error) {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   state_->createFileFailure = error;
 }
 
 void MemoryFileSystem::failWrite(int nth, std::errc error) {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   state_->writesUntilFailure = nth;
   state_->writeFailure = error;
 }
 
 void MemoryFileSystem::failPlace(std::errc error) {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   state_->placeFailure = error;
 }
 
 void MemoryFileSystem::failReadFile(std::errc error) {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   state_->readFailure = error;
 }
 
 void MemoryFileSystem::failMoveFile(std::errc error) {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   state_->moveFailure = error;
 }
 
 void MemoryFileSystem::addFile(const std::string& path, std::string text) {
   static_cast<void>(createDirectories(path.substr(0, path.rfind('/')), 0755));
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   state_->files[path] = std::move(text);
 }
 
 void MemoryFileSystem::addSymbolicLink(const std::string& path) {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   state_->links.insert(path);
 }
 
 std::optional<std::string> MemoryFileSystem::contents(const std::string& path) const {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   const auto found = state_->files.find(path);
   return found == state_->files.end() ? std::nullopt : std::optional(found->second);
 }
 
 std::vector<std::string> MemoryFileSystem::files() const {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   std::vector<std::string> paths;
   for (const auto& [path, text] : state_->files) paths.push_back(path);
   return paths;
 }
 
 std::optional<unsigned> MemoryFileSystem::directoryMode(const std::string& path) const {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   const auto found = state_->directories.find(path);
   return found == state_->directories.end() ? std::nullopt : std::optional(found->second);
 }
 
 int MemoryFileSystem::openFiles() const {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   return state_->openFiles;
 }
 

@@ -3,13 +3,13 @@
 
 #include <map>
 #include <memory>
-#include <mutex>
 #include <optional>
 #include <set>
 #include <string>
 #include <vector>
 
 #include "platform/FileSystem.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -56,21 +56,21 @@ class MemoryFileSystem final : public FileSystem {
 
  private:
   struct State {
-    mutable std::mutex mutex;  // guards all below
-    std::map<std::string, unsigned> directories;
-    std::map<std::string, std::string> files;
-    std::set<std::string> links;
-    std::errc createDirectoriesFailure{};
-    std::errc createFileFailure{};
-    std::errc writeFailure{};
-    int writesUntilFailure = 0;  // 0 for none
-    std::errc placeFailure{};
-    std::errc readFailure{};
-    std::errc moveFailure{};
-    int openFiles = 0;
+    Mutex mutex;
+    std::map<std::string, unsigned> directories GUARDED_BY(mutex);
+    std::map<std::string, std::string> files GUARDED_BY(mutex);
+    std::set<std::string> links GUARDED_BY(mutex);
+    std::errc createDirectoriesFailure GUARDED_BY(mutex){};
+    std::errc createFileFailure GUARDED_BY(mutex){};
+    std::errc writeFailure GUARDED_BY(mutex){};
+    int writesUntilFailure GUARDED_BY(mutex) = 0;  // 0 for none
+    std::errc placeFailure GUARDED_BY(mutex){};
+    std::errc readFailure GUARDED_BY(mutex){};
+    std::errc moveFailure GUARDED_BY(mutex){};
+    int openFiles GUARDED_BY(mutex) = 0;
 
-    // Whether something stands there. Under the mutex.
-    bool holds(const std::string& path) const {
+    // Whether something stands there.
+    bool holds(const std::string& path) const REQUIRES(mutex) {
       return files.contains(path) || directories.contains(path) || links.contains(path);
     }
   };

@@ -7,25 +7,25 @@ namespace tonewerk {
 
 void MemoryIssueDraftService::createDraft(TrackletDraft draft, std::optional<std::string> processName,
                                           std::string displayReason, CompletionHandler completionHandler) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   requests_.push_back({std::move(draft), std::move(processName), std::move(displayReason)});
   waiting_.push_back(std::move(completionHandler));
 }
 
 std::vector<MemoryIssueDraftService::Request> MemoryIssueDraftService::requests() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return requests_;
 }
 
 std::size_t MemoryIssueDraftService::unanswered() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return waiting_.size();
 }
 
 bool MemoryIssueDraftService::answerNext(const std::optional<std::string>& error) {
   CompletionHandler handler;
   {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     if (waiting_.empty()) return false;
     handler = std::move(waiting_.front());
     waiting_.pop_front();

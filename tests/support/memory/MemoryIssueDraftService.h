@@ -3,12 +3,12 @@
 
 #include <cstddef>
 #include <deque>
-#include <mutex>
 #include <optional>
 #include <string>
 #include <vector>
 
 #include "platform/IssueDraftService.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -35,9 +35,9 @@ class MemoryIssueDraftService final : public IssueDraftService {
   bool answerNext(const std::optional<std::string>& error = std::nullopt);
 
  private:
-  mutable std::mutex mutex_;  // guards what follows
-  std::vector<Request> requests_;
-  std::deque<CompletionHandler> waiting_;
+  mutable Mutex mutex_;
+  std::vector<Request> requests_ GUARDED_BY(mutex_);
+  std::deque<CompletionHandler> waiting_ GUARDED_BY(mutex_);
 };
 
 }  // namespace tonewerk

@@ -3,16 +3,18 @@
 
 #include <utility>
 
+#include "values/Mutex.h"
+
 namespace tonewerk {
 
 struct MemoryLinkReport::State {
-  mutable std::mutex mutex;  // guards all below
-  std::vector<std::shared_ptr<Session>> sessions;
-  bool answersAtOnce = true;
-  LinkReportSession::Backends backends = std::vector<std::string>{"memory"};
-  bool givesTokens = true;
-  std::size_t tokenCount = 0;
-  std::optional<std::string> problem;
+  Mutex mutex;
+  std::vector<std::shared_ptr<Session>> sessions GUARDED_BY(mutex);
+  bool answersAtOnce GUARDED_BY(mutex) = true;
+  LinkReportSession::Backends backends GUARDED_BY(mutex) = std::vector<std::string>{"memory"};
+  bool givesTokens GUARDED_BY(mutex) = true;
+  std::size_t tokenCount GUARDED_BY(mutex) = 0;
+  std::optional<std::string> problem GUARDED_BY(mutex);
 };
 
 class MemoryLinkReport::MemorySession final : public LinkReportSession {
@@ -22,22 +24,24 @@ class MemoryLinkReport::MemorySession final : public LinkReportSession {
   MemorySession(const MemorySession&) = delete;
   MemorySession& operator=(const MemorySession&) = delete;
   ~MemorySession() override {
-    const std::lock_guard lock(state_->mutex);
+    const MutexLock lock(state_->mutex);
     session_->isOpen = false;
   }
 
   void startConfigurationWithCompletionHandler(CompletionHandler handler) override {
+    Backends backends;
     {
-      const std::lock_guard lock(state_->mutex);
+      const MutexLock lock(state_->mutex);
       session_->handler = handler;
       if (!state_->answersAtOnce) return;
+      backends = state_->backends;
     }
-    handler(state_->backends);
+    handler(std::move(backends));
   }
 
   bool sendMessageWithCategory(std::uint16_t category, std::uint16_t type, const ValueMap& payload,
                                std::string& problem) override {
-    const std::lock_guard lock(state_->mutex);
+    const MutexLock lock(state_->mutex);
     if (state_->problem) {
       problem = *state_->problem;
       return false;
@@ -47,7 +51,7 @@ class MemoryLinkReport::MemorySession final : public LinkReportSession {
   }
 
   void flushMessages() override {
-    const std::lock_guard lock(state_->mutex);
+    const MutexLock lock(state_->mutex);
     ++session_->flushCount;
   }
 
@@ -63,7 +67,7 @@ MemoryLinkReport::~MemoryLinkReport() = default;
 
 std::optional<std::string> MemoryLinkReport::newHierarchyTokenFromParentToken(
     const std::optional<std::string>& parentToken) {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   if (!state_->givesTokens) return std::nullopt;
   return parentToken.value_or("root") + "/" + std::to_string(++state_->tokenCount);
 }
@@ -73,19 +77,19 @@ std::unique_ptr<LinkReportSession> MemoryLinkReport::initWithSessionInfo(
   auto session = std::make_shared<Session>();
   session->sessionInfo = sessionInfo;
   session->userInfo = userInfo;
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   state_->sessions.push_back(session);
   return std::make_unique<MemorySession>(state_, std::move(session));
 }
 
 void MemoryLinkReport::answerAtOnce(LinkReportSession::Backends backends) {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   state_->answersAtOnce = true;
   state_->backends = std::move(backends);
 }
 
 void MemoryLinkReport::answerLater() {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   state_->answersAtOnce = false;
 }
 
@@ -94,22 +98,22 @@ void MemoryLinkReport::answer(std::size_t at, LinkReportSession::Backends backen
 }
 
 void MemoryLinkReport::giveNoTokens() {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   state_->givesTokens = false;
 }
 
 void MemoryLinkReport::failSending(std::string problem) {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   state_->problem = std::move(problem);
 }
 
 std::size_t MemoryLinkReport::count() const {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   return state_->sessions.size();
 }
 
 MemoryLinkReport::Session MemoryLinkReport::session(std::size_t at) const {
-  const std::lock_guard lock(state_->mutex);
+  const MutexLock lock(state_->mutex);
   return *state_->sessions.at(at);
 }
 

@@ -40,29 +40,29 @@ std::string MemoryLog::withoutPrefix(std::string_view message) {
 }
 
 bool MemoryLog::isEnabled(std::string_view category, LogLevel level) const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   const auto own = thresholds_.find(category);
   return level >= (own == thresholds_.end() ? threshold_ : own->second);
 }
 
 void MemoryLog::write(std::string_view subsystem, std::string_view category, LogLevel level,
                       std::string_view message) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   lines_.push_back({std::string(subsystem), std::string(category), level, std::string(message)});
 }
 
 void MemoryLog::setThreshold(LogLevel level) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   threshold_ = level;
 }
 
 void MemoryLog::setThreshold(std::string_view category, LogLevel level) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   thresholds_[std::string(category)] = level;
 }
 
 std::vector<MemoryLog::Line> MemoryLog::lines() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return lines_;
 }
 
@@ -87,7 +87,7 @@ std::vector<std::string> MemoryLog::textsAt(LogLevel level) const {
 }
 
 void MemoryLog::clear() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   lines_.clear();
 }
 

@@ -2,12 +2,12 @@
 #pragma once
 
 #include <map>
-#include <mutex>
 #include <string>
 #include <string_view>
 #include <vector>
 
 #include "platform/Log.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -51,10 +51,10 @@ class MemoryLog final : public Log {
   void clear();
 
  private:
-  mutable std::mutex mutex_;  // guards all below
-  LogLevel threshold_ = LogLevel::kDebug;
-  std::map<std::string, LogLevel, std::less<>> thresholds_;
-  std::vector<Line> lines_;
+  mutable Mutex mutex_;
+  LogLevel threshold_ GUARDED_BY(mutex_) = LogLevel::kDebug;
+  std::map<std::string, LogLevel, std::less<>> thresholds_ GUARDED_BY(mutex_);
+  std::vector<Line> lines_ GUARDED_BY(mutex_);
 };
 
 }  // namespace tonewerk

@@ -6,6 +6,8 @@
 #include <string>
 #include <utility>
 
+#include "values/Mutex.h"
+
 namespace tonewerk {
 
 // Both ends of the connection; the client, the listener's delegate and replies under way share it.
@@ -42,7 +44,7 @@ class MemoryClient::Connection final : public MessagingConnection,
   void end() {
     if (hasEnded()) return;
     {
-      const std::lock_guard lock(mutex_);
+      const MutexLock lock(mutex_);
       hasEnded_ = true;
     }
     if (interrupted_) interrupted_();
@@ -54,31 +56,34 @@ class MemoryClient::Connection final : public MessagingConnection,
 
   void reply(std::uint32_t requestIdentifier, const std::optional<ReplyError>& error,
              const std::optional<Value>& result) override {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     if (hasEnded_) return;
     responses_.push_back({requestIdentifier, error, error ? std::nullopt : result});
-    changed_.notify_all();
+    changed_.notifyAll();
   }
 
   void finished(std::size_t) override {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     --unfinished_;
   }
 
   bool hasEnded() const {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     return hasEnded_;
   }
   std::vector<MemoryResponse> responses() const {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     return responses_;
   }
   bool waitForResponses(std::size_t count, std::chrono::milliseconds timeout) const {
-    std::unique_lock lock(mutex_);
-    return changed_.wait_for(lock, timeout, [&] { return responses_.size() >= count; });
+    const auto end = std::chrono::steady_clock::now() + timeout;
+    MutexLock lock(mutex_);
+    while (responses_.size() < count && changed_.waitUntil(lock, end)) {
+    }
+    return responses_.size() >= count;
   }
   std::size_t unfinished() const {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     return unfinished_;
   }
 
@@ -106,7 +111,7 @@ class MemoryClient::Connection final : public MessagingConnection,
       return reply(messagingError(kInvalidArguments, *problem));
     }
     {
-      const std::lock_guard lock(mutex_);
+      const MutexLock lock(mutex_);
       ++unfinished_;
     }
     // Held here, too: the request itself may end the connection.
@@ -123,12 +128,11 @@ class MemoryClient::Connection final : public MessagingConnection,
   bool isResumed_ = false;
   std::vector<Waiting> waiting_;  // sent before the delegate resumed the connection
 
-  mutable std::mutex mutex_;
-  mutable std::condition_variable changed_;
-  // Under mutex_.
-  bool hasEnded_ = false;
-  std::vector<MemoryResponse> responses_;
-  std::size_t unfinished_ = 0;
+  mutable Mutex mutex_;
+  mutable Condition changed_;
+  bool hasEnded_ GUARDED_BY(mutex_) = false;
+  std::vector<MemoryResponse> responses_ GUARDED_BY(mutex_);
+  std::size_t unfinished_ GUARDED_BY(mutex_) = 0;
 };
 
 MemoryClient::MemoryClient(std::shared_ptr<Connection> connection) : connection_(std::move(connection)) {}

@@ -8,7 +8,7 @@ namespace tonewerk {
 NotificationService::Registration MemoryNotificationService::registerHandler(
     std::string_view name, SerialQueue& queue, std::function<void(Token)> handler) {
   if (!NotificationHandlers::isName(name)) return {kStatusInvalidName, kNoToken};
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   if (failure_ != kStatusOk) return {failure_, kNoToken};
   const Token token = handlers_.add(name, queue, std::move(handler));
   registered_.emplace(token, name);
@@ -16,7 +16,7 @@ NotificationService::Registration MemoryNotificationService::registerHandler(
 }
 
 std::optional<std::uint64_t> MemoryNotificationService::state(Token token) const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   const auto name = registered_.find(token);
   if (name == registered_.end() || unreadable_.count(name->second) != 0) return std::nullopt;
   const auto state = states_.find(name->second);
@@ -25,7 +25,7 @@ std::optional<std::uint64_t> MemoryNotificationService::state(Token token) const
 
 void MemoryNotificationService::cancel(Token token) {
   {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     registered_.erase(token);
   }
   handlers_.remove(token);
@@ -34,7 +34,7 @@ void MemoryNotificationService::cancel(Token token) {
 std::error_code MemoryNotificationService::post(std::string_view name) {
   if (!NotificationHandlers::isName(name)) return std::make_error_code(std::errc::invalid_argument);
   {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     if (postFailure_ != std::errc()) return std::make_error_code(postFailure_);
     states_.try_emplace(std::string(name), 0);
   }
@@ -45,7 +45,7 @@ std::error_code MemoryNotificationService::post(std::string_view name) {
 std::error_code MemoryNotificationService::post(std::string_view name, std::uint64_t state) {
   if (!NotificationHandlers::isName(name)) return std::make_error_code(std::errc::invalid_argument);
   {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     states_.insert_or_assign(std::string(name), state);
     if (const auto found = unreadable_.find(name); found != unreadable_.end()) unreadable_.erase(found);
   }
@@ -54,22 +54,22 @@ std::error_code MemoryNotificationService::post(std::string_view name, std::uint
 }
 
 void MemoryNotificationService::makeUnreadable(std::string_view name) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   unreadable_.emplace(name);
 }
 
 void MemoryNotificationService::failPosts(std::errc error) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   postFailure_ = error;
 }
 
 void MemoryNotificationService::failRegistrations(std::uint32_t status) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   failure_ = status;
 }
 
 std::vector<std::string> MemoryNotificationService::registered() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   std::vector<std::string> names;
   for (const auto& [token, name] : registered_) names.push_back(name);
   return names;

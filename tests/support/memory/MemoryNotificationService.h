@@ -4,7 +4,6 @@
 #include <cstdint>
 #include <functional>
 #include <map>
-#include <mutex>
 #include <optional>
 #include <set>
 #include <string>
@@ -14,6 +13,7 @@
 
 #include "platform/NotificationHandlers.h"
 #include "platform/NotificationService.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -45,12 +45,12 @@ class MemoryNotificationService final : public NotificationService {
 
  private:
   NotificationHandlers handlers_;
-  mutable std::mutex mutex_;  // guards all below
-  std::map<std::string, std::uint64_t, std::less<>> states_;
-  std::set<std::string, std::less<>> unreadable_;
-  std::map<Token, std::string> registered_;
-  std::uint32_t failure_ = kStatusOk;
-  std::errc postFailure_{};
+  mutable Mutex mutex_;
+  std::map<std::string, std::uint64_t, std::less<>> states_ GUARDED_BY(mutex_);
+  std::set<std::string, std::less<>> unreadable_ GUARDED_BY(mutex_);
+  std::map<Token, std::string> registered_ GUARDED_BY(mutex_);
+  std::uint32_t failure_ GUARDED_BY(mutex_) = kStatusOk;
+  std::errc postFailure_ GUARDED_BY(mutex_){};
 };
 
 }  // namespace tonewerk

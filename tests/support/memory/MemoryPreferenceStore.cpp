@@ -51,7 +51,7 @@ std::optional<Value> MemoryPreferenceStore::read(std::string_view domain, std::s
 }
 
 ValueMap MemoryPreferenceStore::readAll(std::string_view domain) const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   const Domain* held = find(domain);
   if (held == nullptr) return {};
   ValueMap all = held->configured;
@@ -67,7 +67,7 @@ std::error_code MemoryPreferenceStore::checkWrite(std::string_view domain, std::
 
 std::error_code MemoryPreferenceStore::write(std::string_view domain, std::string_view key,
                                              const Value& value, std::string* problem) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   if (const std::error_code error = checkWrite(domain, problem)) return error;
   if (!canBeStored(value)) {
     return failed(std::errc::result_out_of_range, "an integer above 9223372036854775807", problem);
@@ -83,7 +83,7 @@ std::error_code MemoryPreferenceStore::write(std::string_view domain, std::strin
 
 std::error_code MemoryPreferenceStore::remove(std::string_view domain, std::string_view key,
                                               std::string* problem) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   if (const std::error_code error = checkWrite(domain, problem)) return error;
   const auto held = domains_.find(domain);
   if (held != domains_.end() && held->second.written.erase(key)) return {};
@@ -94,17 +94,17 @@ std::error_code MemoryPreferenceStore::remove(std::string_view domain, std::stri
 }
 
 void MemoryPreferenceStore::configure(std::string_view domain, std::string_view key, const Value& value) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   domains_[std::string(domain)].configured.set(key, value);
 }
 
 void MemoryPreferenceStore::failWrites(std::errc error) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   failure_ = error;
 }
 
 ValueMap MemoryPreferenceStore::written(std::string_view domain) const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   const Domain* held = find(domain);
   return held == nullptr ? ValueMap() : held->written;
 }

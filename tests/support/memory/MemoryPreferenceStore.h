@@ -2,10 +2,10 @@
 #pragma once
 
 #include <map>
-#include <mutex>
 #include <string>
 
 #include "platform/PreferenceStore.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -35,12 +35,12 @@ class MemoryPreferenceStore final : public PreferenceStore {
     ValueMap written;
   };
 
-  const Domain* find(std::string_view domain) const;
-  std::error_code checkWrite(std::string_view domain, std::string* problem) const;
+  const Domain* find(std::string_view domain) const REQUIRES(mutex_);
+  std::error_code checkWrite(std::string_view domain, std::string* problem) const REQUIRES(mutex_);
 
-  mutable std::mutex mutex_;  // guards all below
-  std::map<std::string, Domain, std::less<>> domains_;
-  std::errc failure_{};
+  mutable Mutex mutex_;
+  std::map<std::string, Domain, std::less<>> domains_ GUARDED_BY(mutex_);
+  std::errc failure_ GUARDED_BY(mutex_){};
 };
 
 }  // namespace tonewerk

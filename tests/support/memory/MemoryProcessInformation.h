@@ -2,9 +2,9 @@
 #pragma once
 
 #include <map>
-#include <mutex>
 
 #include "platform/ProcessInformation.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -19,48 +19,48 @@ class MemoryProcessInformation final : public ProcessInformation {
   MemoryProcessInformation() { setName(kOwnProcessIdentifier, "twreportingd"); }
 
   std::optional<std::string> processName(std::int32_t processIdentifier) const override {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     const auto found = names_.find(processIdentifier);
     return found == names_.end() ? std::nullopt : std::optional(found->second);
   }
   std::int32_t ownProcessIdentifier() const override { return kOwnProcessIdentifier; }
   std::variant<std::uint64_t, std::string> physicalFootprint() const override {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     return footprint_;
   }
   std::int64_t processorTimeMicroseconds() const override {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     return processorTime_;
   }
 
   void setName(std::int32_t processIdentifier, std::string name) {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     names_[processIdentifier] = std::move(name);
   }
   // The process is gone.
   void forget(std::int32_t processIdentifier) {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     names_.erase(processIdentifier);
   }
   void setFootprint(std::uint64_t bytes) {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     footprint_ = bytes;
   }
   // From now on physicalFootprint() fails with this text.
   void failFootprint(std::string problem) {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     footprint_ = std::move(problem);
   }
   void setProcessorTime(std::int64_t microseconds) {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     processorTime_ = microseconds;
   }
 
  private:
-  mutable std::mutex mutex_;  // guards all below
-  std::map<std::int32_t, std::string> names_;
-  std::variant<std::uint64_t, std::string> footprint_ = std::uint64_t{8} << 20;
-  std::int64_t processorTime_ = 0;
+  mutable Mutex mutex_;
+  std::map<std::int32_t, std::string> names_ GUARDED_BY(mutex_);
+  std::variant<std::uint64_t, std::string> footprint_ GUARDED_BY(mutex_) = std::uint64_t{8} << 20;
+  std::int64_t processorTime_ GUARDED_BY(mutex_) = 0;
 };
 
 }  // namespace tonewerk

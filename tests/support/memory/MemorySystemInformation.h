@@ -1,42 +1,45 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <mutex>
-
 #include "platform/SystemInformation.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
 // A device in the state that the test gives it; at first cool, mains powered and idle. Any thread.
 class MemorySystemInformation final : public SystemInformation {
  public:
-  int thermalLevel() const override { return get(thermalLevel_); }
-  bool isLowPowerModeEnabled() const override { return get(lowPowerMode_); }
-  std::array<double, 3> loadAverages() const override { return get(loadAverages_); }
-  double uptimeSeconds() const override { return get(uptimeSeconds_); }
+  int thermalLevel() const override { return get(&State::thermalLevel); }
+  bool isLowPowerModeEnabled() const override { return get(&State::lowPowerMode); }
+  std::array<double, 3> loadAverages() const override { return get(&State::loadAverages); }
+  double uptimeSeconds() const override { return get(&State::uptimeSeconds); }
 
-  void setThermalLevel(int level) { set(thermalLevel_, level); }
-  void setLowPowerMode(bool enabled) { set(lowPowerMode_, enabled); }
-  void setLoadAverages(std::array<double, 3> averages) { set(loadAverages_, averages); }
-  void setUptime(double seconds) { set(uptimeSeconds_, seconds); }
+  void setThermalLevel(int level) { set(&State::thermalLevel, level); }
+  void setLowPowerMode(bool enabled) { set(&State::lowPowerMode, enabled); }
+  void setLoadAverages(std::array<double, 3> averages) { set(&State::loadAverages, averages); }
+  void setUptime(double seconds) { set(&State::uptimeSeconds, seconds); }
 
  private:
+  struct State {
+    int thermalLevel = 0;
+    bool lowPowerMode = false;
+    std::array<double, 3> loadAverages{};
+    double uptimeSeconds = 0.0;
+  };
+
   template <typename T>
-  T get(const T& field) const {
-    const std::lock_guard lock(mutex_);
-    return field;
+  T get(T State::*field) const {
+    const MutexLock lock(mutex_);
+    return state_.*field;
   }
   template <typename T>
-  void set(T& field, T value) {
-    const std::lock_guard lock(mutex_);
-    field = value;
+  void set(T State::*field, T value) {
+    const MutexLock lock(mutex_);
+    state_.*field = value;
   }
 
-  mutable std::mutex mutex_;  // guards all below
-  int thermalLevel_ = 0;
-  bool lowPowerMode_ = false;
-  std::array<double, 3> loadAverages_{};
-  double uptimeSeconds_ = 0.0;
+  mutable Mutex mutex_;
+  State state_ GUARDED_BY(mutex_);
 };
 
 }  // namespace tonewerk

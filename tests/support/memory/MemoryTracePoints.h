@@ -1,11 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <mutex>
 #include <string>
 #include <vector>
 
 #include "platform/TracePoints.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -16,7 +16,7 @@ namespace tonewerk {
 class MemoryTracePoints final : public TracePoints {
  public:
   void emit(std::uint32_t code) override {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     codes_.push_back(code);
   }
 
@@ -24,28 +24,28 @@ class MemoryTracePoints final : public TracePoints {
   void endInterval(const char* name, std::int64_t identifier) override { add("end ", name, identifier); }
 
   std::vector<std::string> intervals() const {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     return intervals_;
   }
   std::vector<std::uint32_t> codes() const {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     return codes_;
   }
   void clear() {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     codes_.clear();
     intervals_.clear();
   }
 
  private:
   void add(const char* edge, const char* name, std::int64_t identifier) {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     intervals_.push_back(std::string(edge) + name + " " + std::to_string(identifier));
   }
 
-  mutable std::mutex mutex_;
-  std::vector<std::uint32_t> codes_;    // guarded by mutex_
-  std::vector<std::string> intervals_;  // guarded by mutex_
+  mutable Mutex mutex_;
+  std::vector<std::uint32_t> codes_ GUARDED_BY(mutex_);
+  std::vector<std::string> intervals_ GUARDED_BY(mutex_);
 };
 
 }  // namespace tonewerk

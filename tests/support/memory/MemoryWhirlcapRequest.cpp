@@ -9,7 +9,7 @@ void MemoryWhirlcapRequest::request(std::string requester, std::string reason, s
                                     ValueMap payload, Flags flags) {
   std::function<void()> observer;
   {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     requests_.push_back(
         {std::move(requester), std::move(reason), std::move(description), std::move(payload), flags});
     observer = observer_;
@@ -18,12 +18,12 @@ void MemoryWhirlcapRequest::request(std::string requester, std::string reason, s
 }
 
 std::vector<MemoryWhirlcapRequest::Request> MemoryWhirlcapRequest::requests() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return requests_;
 }
 
 void MemoryWhirlcapRequest::onRequest(std::function<void()> observer) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   observer_ = std::move(observer);
 }
 

@@ -2,11 +2,11 @@
 #pragma once
 
 #include <functional>
-#include <mutex>
 #include <string>
 #include <vector>
 
 #include "platform/WhirlcapRequest.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -31,9 +31,9 @@ class MemoryWhirlcapRequest final : public WhirlcapRequest {
   void onRequest(std::function<void()> observer);
 
  private:
-  mutable std::mutex mutex_;  // guards what follows
-  std::vector<Request> requests_;
-  std::function<void()> observer_;
+  mutable Mutex mutex_;
+  std::vector<Request> requests_ GUARDED_BY(mutex_);
+  std::function<void()> observer_ GUARDED_BY(mutex_);
 };
 
 }  // namespace tonewerk
