@@ -8,7 +8,7 @@
 #include <string>
 #include <thread>
 
-#include "platform/KolviProbeMaker.h"
+#include "platform/Kolvi.h"
 #include "platform/linux/json/JsonBenchfile.h"
 #include "platform/linux/threads/SystemClock.h"
 #include "platform/linux/tracing/lttng/TracingRig.h"

@@ -7,7 +7,7 @@
 #include <iterator>
 #include <utility>
 
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "protocol/AudioEvent.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingSession.h"

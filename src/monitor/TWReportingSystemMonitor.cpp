@@ -6,7 +6,7 @@
 #include <utility>
 
 #include "platform/Clock.h"
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/PreferenceStore.h"
 #include "platform/SystemInformation.h"
 #include "protocol/FeatureTable.h"

@@ -4,7 +4,7 @@
 #include <string_view>
 #include <system_error>
 
-#include "platform/UniqueFunction.h"
+#include "values/UniqueFunction.h"
 
 namespace tonewerk {
 

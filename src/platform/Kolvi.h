@@ -2,7 +2,10 @@
 #pragma once
 
 #include <cstdint>
+#include <functional>
 #include <memory>
+#include <optional>
+#include <set>
 #include <string>
 #include <vector>
 
@@ -55,5 +58,17 @@ class Kolvi {
   // Reads the trace. Null when that fails, a trace with lost events included; `problem` then says why.
   virtual std::unique_ptr<KolviModel> openModel(const std::string& traceLocation, std::string& problem) = 0;
 };
+
+// The probe dictionaries that a probe list holds: an array's elements, or the one map that it is. None for
+// any other root.
+std::optional<ValueArray> probeDictionariesOf(const Value& root);
+
+// The signposts whose intervals the dictionaries and their children ask for.
+std::set<std::string> signpostsOf(const ValueArray& dictionaries);
+
+// What KolviModel::makeProbes() promises, over whatever knows a signpost's intervals.
+std::vector<KolviProbe> makeKolviProbes(
+    const ValueArray& dictionaries,
+    const std::function<std::vector<KolviEvent>(const std::string& signpost)>& eventsOf);
 
 }  // namespace tonewerk

@@ -1,7 +1,19 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/Log.h"
 
+#include <cassert>
+#include <cstdio>
+
 namespace tonewerk {
+namespace {
+
+std::string_view baseName(std::string_view file) {
+  const std::size_t slash = file.rfind('/');
+  if (slash != std::string_view::npos) file.remove_prefix(slash + 1);
+  return file.substr(0, file.rfind('.'));
+}
+
+}  // namespace
 
 std::string_view textOf(LogLevel level) {
   switch (level) {
@@ -15,6 +27,45 @@ std::string_view textOf(LogLevel level) {
       return "error";
   }
   return "default";
+}
+
+void appendLogNumber(std::string& out, double number, char conversion) {
+  if (conversion != 'f') {
+    out += textOf(number);
+    return;
+  }
+  char text[352];  // the longest double has 309 digits before the point
+  std::snprintf(text, sizeof(text), "%f", number);
+  out += text;
+}
+
+std::string logPrefix(std::string_view file, int line) {
+  const std::string name(baseName(file));
+  char text[128];
+  std::snprintf(text, sizeof(text), "%25s:%-5d ", name.c_str(), line);
+  return text;
+}
+
+void log_detail::write(LogLevel level, const LogSite& site, std::string_view format,
+                       std::span<const Argument> arguments) {
+  std::string message = logPrefix(site.file, site.line);
+  auto argument = arguments.begin();
+  for (std::size_t at = 0; at < format.size(); ++at) {
+    if (format[at] != '%' || at + 1 == format.size()) {
+      message += format[at];
+      continue;
+    }
+    ++at;
+    if (format[at] == '%') {
+      message += '%';
+      continue;
+    }
+    while (isLengthModifier(format[at])) ++at;
+    assert(argument != arguments.end());
+    argument->append(message, argument->object, format[at]);
+    ++argument;
+  }
+  site.category->write(level, message);
 }
 
 }  // namespace tonewerk

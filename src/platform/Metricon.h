@@ -3,7 +3,7 @@
 
 #include <string_view>
 
-#include "platform/UniqueFunction.h"
+#include "values/UniqueFunction.h"
 #include "values/Value.h"
 
 namespace tonewerk {

@@ -4,7 +4,7 @@
 #include <memory>
 #include <string>
 
-#include "platform/UniqueFunction.h"
+#include "values/UniqueFunction.h"
 
 namespace tonewerk {
 

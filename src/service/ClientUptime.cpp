@@ -4,7 +4,7 @@
 #include <cmath>
 
 #include "platform/Clock.h"
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/Metricon.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingUtility.h"

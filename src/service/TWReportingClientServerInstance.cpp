@@ -5,7 +5,7 @@
 #include <utility>
 #include <vector>
 
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/SerialQueue.h"
 #include "protocol/Requests.h"
 #include "service/MessageTap.h"

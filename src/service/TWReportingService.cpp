@@ -8,7 +8,7 @@
 
 #include "monitor/TWReportingSystemMonitor.h"
 #include "platform/Clock.h"
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/ProcessInformation.h"
 #include "platform/SerialQueue.h"
 #include "protocol/Requests.h"

@@ -8,7 +8,7 @@
 #include <optional>
 #include <vector>
 
-#include "platform/MessagingListener.h"
+#include "platform/Messaging.h"
 #include "platform/TimerService.h"
 #include "service/MessageTap.h"
 #include "service/TWReportingServiceDelegateProtocol.h"

@@ -6,7 +6,7 @@
 #include <string>
 #include <utility>
 
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/SerialQueue.h"
 #include "service/MessageTap.h"
 #include "service/SessionListing.h"

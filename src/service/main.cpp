@@ -17,8 +17,7 @@
 #include <unistd.h>
 
 #include "monitor/TWReportingSystemMonitor.h"
-#include "platform/LogCategory.h"
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/Platform.h"
 #include "platform/linux/LinuxPlatform.h"
 #include "platform/linux/dbus/DbusListener.h"

@@ -5,7 +5,7 @@
 #include <cassert>
 
 #include "platform/DeviceFacts.h"
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "session/TWReportingUtility.h"
 #include "session/WeakQueueRef.h"
 

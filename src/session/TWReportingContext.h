@@ -8,7 +8,7 @@
 #include <unordered_map>
 #include <vector>
 
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "platform/Platform.h"
 #include "platform/SerialQueue.h"
 #include "protocol/AudioEvent.h"

@@ -4,7 +4,7 @@
 #include <algorithm>
 
 #include "platform/Clock.h"
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingTracePoint.h"

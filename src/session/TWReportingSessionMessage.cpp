@@ -5,7 +5,7 @@
 #include <cmath>
 #include <utility>
 
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingUtility.h"
 

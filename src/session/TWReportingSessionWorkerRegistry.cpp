@@ -3,7 +3,7 @@
 
 #include <utility>
 
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "session/TWReportingUtility.h"
 
 namespace tonewerk {

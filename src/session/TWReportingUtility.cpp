@@ -6,7 +6,7 @@
 #include <cstdio>
 
 #include "platform/Clock.h"
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/ProcessInformation.h"
 #include "platform/SystemInformation.h"
 #include "session/TWReportingContext.h"

@@ -9,7 +9,7 @@
 #include <string>
 #include <string_view>
 
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "protocol/AudioEvent.h"
 #include "protocol/EventTexts.h"
 #include "values/Value.h"

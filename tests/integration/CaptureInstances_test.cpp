@@ -8,7 +8,7 @@
 #include <string>
 #include <vector>
 
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "platform/linux/diagnostics/DiagnosticsDirectory.h"
 #include "platform/linux/diagnostics/DiagnosticsStore.h"
 #include "platform/linux/diagnostics/LinuxCapsa.h"

@@ -4,7 +4,7 @@
 #include <filesystem>
 #include <string>
 
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "platform/linux/channels/LinuxChanmeter.h"
 #include "platform/linux/commands/LinuxCommandRunner.h"
 #include "platform/linux/diagnostics/DiagnosticsStore.h"

@@ -2,7 +2,6 @@
 #pragma once
 
 #include "platform/Log.h"
-#include "platform/LogLine.h"
 #include "tools/twctl/Tool.h"
 
 namespace tonewerk {

@@ -4,7 +4,7 @@
 #include <algorithm>
 #include <array>
 
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "session/TWReportingUtility.h"
 
 namespace tonewerk {

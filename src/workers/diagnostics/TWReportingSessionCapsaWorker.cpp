@@ -8,7 +8,7 @@
 
 #include "platform/Clock.h"
 #include "platform/DeviceFacts.h"
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionMessage.h"

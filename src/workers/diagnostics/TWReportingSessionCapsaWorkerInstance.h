@@ -8,7 +8,7 @@
 #include <string_view>
 
 #include "platform/FaultsignReporter.h"
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 
 namespace tonewerk {
 

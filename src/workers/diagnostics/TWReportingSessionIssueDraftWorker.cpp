@@ -6,7 +6,7 @@
 #include <utility>
 
 #include "platform/Clock.h"
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingDefaults.h"
 #include "session/TWReportingSession.h"

@@ -9,7 +9,7 @@
 #include <utility>
 
 #include "platform/DetachedThreads.h"
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingDefaults.h"
 #include "session/TWReportingSession.h"

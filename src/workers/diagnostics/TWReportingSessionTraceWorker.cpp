@@ -2,7 +2,7 @@
 #include "workers/diagnostics/TWReportingSessionTraceWorker.h"
 
 #include "platform/FileSystem.h"
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingSession.h"

@@ -3,7 +3,7 @@
 
 #include <utility>
 
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/Semaphore.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingUtility.h"

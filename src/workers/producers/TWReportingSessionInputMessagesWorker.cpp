@@ -7,7 +7,7 @@
 #include <string>
 #include <string_view>
 
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionWorkerUtility.h"

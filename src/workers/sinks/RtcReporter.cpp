@@ -4,7 +4,7 @@
 #include <string_view>
 #include <utility>
 
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/TimerService.h"
 #include "session/StrandPool.h"
 #include "session/TWReportingContext.h"

@@ -8,7 +8,7 @@
 
 #include "platform/FileSystem.h"
 #include "platform/JsonService.h"
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingUtility.h"
 

@@ -4,7 +4,7 @@
 #include <optional>
 
 #include "platform/Clock.h"
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/NotificationService.h"
 #include "platform/WhirlcapRequest.h"
 #include "session/TWReportingContext.h"

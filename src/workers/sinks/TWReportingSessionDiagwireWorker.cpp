@@ -5,7 +5,7 @@
 #include <string_view>
 
 #include "platform/Diagwire.h"
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/pb/AudioIssueDetected.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingSessionMessage.h"

@@ -5,7 +5,7 @@
 #include <utility>
 
 #include "platform/Energybook.h"
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingSession.h"

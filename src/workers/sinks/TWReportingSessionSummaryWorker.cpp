@@ -5,7 +5,7 @@
 #include <string>
 #include <string_view>
 
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/ProcessInformation.h"
 #include "platform/SystemInformation.h"
 #include "session/TWReportingContext.h"

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "support/memory/MemoryKolvi.h"
 
-#include "platform/KolviProbeMaker.h"
+#include "platform/Kolvi.h"
 
 namespace tonewerk {
 namespace {

@@ -9,7 +9,7 @@
 #include <string_view>
 #include <vector>
 
-#include "platform/MessagingListener.h"
+#include "platform/Messaging.h"
 
 namespace tonewerk {
 

@@ -13,7 +13,7 @@
 #include <utility>
 #include <vector>
 
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "platform/linux/socket/ServerSocket.h"
 #include "platform/linux/socket/UnixSocketListener.h"
 #include "protocol/Requests.h"

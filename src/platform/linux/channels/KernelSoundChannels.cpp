@@ -8,7 +8,7 @@
 #include <memory>
 #include <utility>
 
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/chanmeter/DutyCycles.h"
 #include "platform/linux/channels/ChannelFailures.h"
 #include "platform/linux/channels/PcmStatus.h"

@@ -10,7 +10,7 @@
 #include <string>
 #include <string_view>
 
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "platform/linux/channels/ChannelChoice.h"
 
 namespace tonewerk {

@@ -7,7 +7,7 @@
 #include <system_error>
 #include <utility>
 
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/linux/channels/ChannelFailures.h"
 #include "platform/linux/files/TextFile.h"
 #include "platform/linux/files/WholeFile.h"

@@ -9,7 +9,7 @@
 #include <string>
 #include <vector>
 
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "platform/linux/channels/ChannelChoice.h"
 #include "platform/linux/channels/ChannelFile.h"
 #include "platform/linux/files/FileStamp.h"

@@ -6,7 +6,7 @@
 #include <systemd/sd-bus.h>
 #include <utility>
 
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/linux/dbus/DbusAnswer.h"
 #include "platform/linux/messaging/AllocatorReclaimer.h"
 

@@ -10,8 +10,8 @@
 #include <unordered_map>
 #include <vector>
 
-#include "platform/LogCategory.h"
-#include "platform/MessagingListener.h"
+#include "platform/Log.h"
+#include "platform/Messaging.h"
 #include "platform/linux/dbus/DbusArguments.h"
 #include "platform/linux/dbus/DbusInterface.h"
 #include "platform/linux/dbus/DbusOutbox.h"

@@ -7,7 +7,7 @@
 #include <sys/eventfd.h>
 #include <utility>
 
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/linux/threads/ThreadProperties.h"
 
 namespace tonewerk {

@@ -9,8 +9,8 @@
 #include <string>
 #include <thread>
 
-#include "platform/LogCategory.h"
-#include "platform/MessagingListener.h"
+#include "platform/Log.h"
+#include "platform/Messaging.h"
 #include "platform/linux/dbus/DbusInterface.h"
 #include "platform/linux/dbus/DbusService.h"
 #include "platform/linux/threads/IoWaker.h"

@@ -10,7 +10,7 @@
 #include <systemd/sd-bus.h>
 #include <utility>
 
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/linux/dbus/DbusAnswer.h"
 
 namespace tonewerk {

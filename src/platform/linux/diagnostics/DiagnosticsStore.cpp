@@ -10,7 +10,7 @@
 
 #include "platform/Clock.h"
 #include "platform/JsonService.h"
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/PreferenceStore.h"
 #include "platform/linux/threads/ThreadProperties.h"
 

@@ -8,7 +8,7 @@
 #include <utility>
 #include <vector>
 
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/PreferenceStore.h"
 #include "platform/SerialQueue.h"
 #include "platform/linux/diagnostics/CaptureSessions.h"

@@ -3,7 +3,7 @@
 
 #include <utility>
 
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/linux/diagnostics/DiagnosticsStore.h"
 
 namespace tonewerk {

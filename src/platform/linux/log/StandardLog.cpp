@@ -5,7 +5,7 @@
 #include <string>
 #include <unistd.h>
 
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/linux/log/JournalLog.h"
 #include "platform/linux/log/LogThreshold.h"
 #include "platform/linux/log/StreamLog.h"

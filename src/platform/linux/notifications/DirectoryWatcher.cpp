@@ -16,7 +16,7 @@
 #include <unistd.h>
 #include <utility>
 
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/linux/threads/ThreadProperties.h"
 
 namespace tonewerk {

@@ -8,7 +8,7 @@
 #include <string_view>
 #include <thread>
 
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "platform/linux/descriptors/FileDescriptor.h"
 #include "values/GrowingDelay.h"
 

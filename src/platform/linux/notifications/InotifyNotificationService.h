@@ -3,7 +3,7 @@
 
 #include <string>
 
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "platform/NotificationHandlers.h"
 #include "platform/NotificationService.h"
 #include "platform/linux/notifications/DirectoryWatcher.h"

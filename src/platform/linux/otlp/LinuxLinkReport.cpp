@@ -7,7 +7,7 @@
 #include <vector>
 
 #include "platform/Clock.h"
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/PreferenceStore.h"
 #include "platform/linux/otlp/HttpClient.h"
 #include "platform/linux/otlp/LinkReportBackends.h"

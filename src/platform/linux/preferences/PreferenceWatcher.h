@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "platform/linux/notifications/DirectoryWatcher.h"
 
 namespace tonewerk {

@@ -5,7 +5,7 @@
 #include <string>
 
 #include "platform/DeviceFacts.h"
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "platform/linux/preferences/TomlFile.h"
 
 namespace tonewerk {

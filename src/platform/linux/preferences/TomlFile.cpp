@@ -3,7 +3,7 @@
 
 #include <sys/stat.h>
 
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/linux/files/TextFile.h"
 #include "platform/linux/preferences/TomlText.h"
 

@@ -5,7 +5,7 @@
 #include <string>
 #include <system_error>
 
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "platform/linux/files/FileStamp.h"
 #include "values/Value.h"
 

@@ -7,7 +7,7 @@
 #include <system_error>
 #include <utility>
 
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/linux/messaging/AllocatorReclaimer.h"
 #include "values/ShortenedText.h"
 

@@ -10,8 +10,8 @@
 #include <string>
 #include <string_view>
 
-#include "platform/LogCategory.h"
-#include "platform/MessagingConnection.h"
+#include "platform/Log.h"
+#include "platform/Messaging.h"
 #include "platform/linux/descriptors/Epoll.h"
 #include "platform/linux/descriptors/FileDescriptor.h"
 #include "platform/linux/messagepack/RpcFrameReader.h"

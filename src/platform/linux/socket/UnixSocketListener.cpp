@@ -11,7 +11,7 @@
 #include <system_error>
 #include <utility>
 
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/linux/threads/BatchScope.h"
 
 namespace tonewerk {

@@ -13,7 +13,7 @@
 #include <unordered_map>
 #include <vector>
 
-#include "platform/MessagingListener.h"
+#include "platform/Messaging.h"
 #include "platform/linux/descriptors/Epoll.h"
 #include "platform/linux/messagepack/RpcFrameReader.h"
 #include "platform/linux/socket/ServerSocket.h"

@@ -5,7 +5,7 @@
 #include <string>
 #include <thread>
 
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "platform/linux/channels/LinuxChanmeter.h"
 #include "tools/twctl/ToolLog.h"
 #include "tools/twctl/commands/Commands.h"

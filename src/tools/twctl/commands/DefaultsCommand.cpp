@@ -8,7 +8,7 @@
 #include <system_error>
 #include <vector>
 
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "platform/PreferenceSchema.h"
 #include "platform/linux/notifications/NotificationFiles.h"
 #include "platform/linux/preferences/TomlPreferenceStore.h"

@@ -11,7 +11,7 @@
 #include <optional>
 #include <sstream>
 
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "platform/linux/json/NlohmannJsonService.h"
 #include "support/TemporaryDirectory.h"
 #include "support/manual/ManualClock.h"

@@ -9,7 +9,7 @@
 #include <unistd.h>
 #include <vector>
 
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/linux/descriptors/FileDescriptor.h"
 #include "support/manual/ManualClock.h"
 

@@ -13,7 +13,7 @@
 #include <utility>
 #include <vector>
 
-#include "platform/MessagingListener.h"
+#include "platform/Messaging.h"
 
 namespace tonewerk {
 

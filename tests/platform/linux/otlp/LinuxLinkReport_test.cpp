@@ -3,7 +3,7 @@
 
 #include <gmock/gmock.h>
 
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "platform/linux/otlp/CurlHttpClient.h"
 #include "platform/linux/store/ReportStore.h"
 #include "support/OtlpReceiver.h"

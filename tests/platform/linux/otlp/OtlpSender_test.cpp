@@ -4,7 +4,7 @@
 #include <gmock/gmock.h>
 #include <zlib.h>
 
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "support/manual/ManualClock.h"
 #include "support/memory/MemoryLog.h"
 #include "support/memory/ScriptedHttpClient.h"

@@ -6,7 +6,7 @@
 #include <thread>
 #include <vector>
 
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "platform/linux/store/ReportStore.h"
 #include "platform/linux/store/StoreEnergybook.h"
 #include "support/TemporaryDirectory.h"

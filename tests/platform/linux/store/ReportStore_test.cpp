@@ -15,7 +15,7 @@
 #include <tuple>
 #include <vector>
 
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "support/TemporaryDirectory.h"
 #include "support/manual/ManualClock.h"
 #include "support/memory/MemoryJsonService.h"

@@ -3,7 +3,7 @@
 
 #include <gtest/gtest.h>
 
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "platform/linux/protobuf/ProtozeroReader.h"
 #include "platform/linux/store/ReportStore.h"
 #include "platform/linux/store/SqliteDatabase.h"

@@ -5,7 +5,7 @@
 #include <optional>
 #include <string>
 
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "platform/linux/store/ReportStore.h"
 #include "support/TemporaryDirectory.h"
 #include "support/manual/ManualClock.h"

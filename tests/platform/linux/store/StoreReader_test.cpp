@@ -9,7 +9,7 @@
 #include <string>
 #include <vector>
 
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "platform/linux/store/ReportStore.h"
 #include "support/TemporaryDirectory.h"
 #include "support/manual/ManualClock.h"

@@ -5,7 +5,7 @@
 #include <string>
 #include <vector>
 
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "platform/linux/json/NlohmannJsonService.h"
 #include "platform/linux/store/ReportStore.h"
 #include "support/TemporaryDirectory.h"

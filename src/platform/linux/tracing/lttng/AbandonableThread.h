@@ -9,7 +9,7 @@
 #include <optional>
 #include <thread>
 
-#include "platform/UniqueFunction.h"
+#include "values/UniqueFunction.h"
 
 namespace tonewerk {
 

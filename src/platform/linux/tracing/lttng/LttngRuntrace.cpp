@@ -10,7 +10,7 @@
 #include <unistd.h>
 #include <utility>
 
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/linux/tracing/lttng/CallLimit.h"
 #include "platform/linux/tracing/lttng/CheckSignpost.h"
 #include "platform/linux/tracing/lttng/LttngTrace.h"

@@ -6,7 +6,7 @@
 
 #include "platform/FileSystem.h"
 #include "platform/JsonService.h"
-#include "platform/KolviProbeMaker.h"
+#include "platform/Kolvi.h"
 
 namespace tonewerk {
 namespace {

@@ -15,7 +15,7 @@
 #include <utility>
 #include <vector>
 
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "platform/linux/descriptors/FileDescriptor.h"
 #include "platform/linux/files/TextFile.h"
 

@@ -3,7 +3,7 @@
 
 #include <utility>
 
-#include "platform/KolviProbeMaker.h"
+#include "platform/Kolvi.h"
 #include "platform/linux/commands/BoundedCommand.h"
 #include "platform/linux/tracing/lttng/CheckSignpost.h"
 #include "platform/linux/tracing/lttng/TraceIntervals.h"

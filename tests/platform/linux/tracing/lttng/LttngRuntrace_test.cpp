@@ -7,7 +7,7 @@
 #include <gmock/gmock.h>
 #include <thread>
 
-#include "platform/KolviProbeMaker.h"
+#include "platform/Kolvi.h"
 #include "platform/linux/tracing/lttng/CallLimit.h"
 #include "platform/linux/tracing/lttng/LttngTrace.h"
 #include "platform/linux/tracing/lttng/TracingRig.h"

@@ -9,7 +9,7 @@
 #include <sys/types.h>
 #include <unistd.h>
 
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "platform/linux/files/LinuxFileSystem.h"
 #include "platform/linux/json/NlohmannJsonService.h"
 #include "platform/linux/threads/ThreadSemaphores.h"

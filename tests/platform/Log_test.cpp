@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 
 #include <gmock/gmock.h>
 #include <optional>
@@ -7,7 +7,6 @@
 #include <string_view>
 #include <vector>
 
-#include "platform/LogCategory.h"
 #include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
@@ -17,7 +16,7 @@ using testing::ElementsAre;
 
 // A std::string converts to a string_view and to a Value alike; it used to be printed as a list of its
 // characters.
-TEST(LogLineTest, ShowsEveryKindOfTextAsItIs) {
+TEST(LogTest, ShowsEveryKindOfTextAsItIs) {
   MemoryLog log;
   const LogCategory category(log, "com.orvane.tonewerk", "twrs");
   const char* const pointer = "d";
@@ -26,22 +25,22 @@ TEST(LogLineTest, ShowsEveryKindOfTextAsItIs) {
   EXPECT_THAT(log.textsOf("twrs"), ElementsAre("a b c d e"));
 }
 
-TEST(LogLineTest, PrefixIsTheFilesBaseNameAndLine) {
+TEST(LogTest, PrefixIsTheFilesBaseNameAndLine) {
   EXPECT_EQ(logPrefix("/a/b/TWReportingSession.cpp", 214), "       TWReportingSession:214   ");
   EXPECT_EQ(logPrefix("x.h", 1), "                        x:1     ");
   EXPECT_EQ(logPrefix("ANameOfMoreThanTwentyFiveCharacters.cpp", 123456),
             "ANameOfMoreThanTwentyFiveCharacters:123456 ");
 }
 
-TEST(LogLineTest, TakesFileAndLineFromTheCall) {
+TEST(LogTest, TakesFileAndLineFromTheCall) {
   MemoryLog log;
   const LogCategory category(log, "com.orvane.tonewerk", "twrs");
   infoLog(category, "x");
   const int line = __LINE__ - 1;
-  EXPECT_EQ(log.lines().at(0).message, logPrefix("LogLine_test.cpp", line) + "x");
+  EXPECT_EQ(log.lines().at(0).message, logPrefix("Log_test.cpp", line) + "x");
 }
 
-TEST(LogLineTest, ShowsNumbersByTheirOwnType) {
+TEST(LogTest, ShowsNumbersByTheirOwnType) {
   MemoryLog log;
   const LogCategory category(log, "com.orvane.tonewerk", "twrs");
   debugLog(category, "%i %lli %lu %zu %d 100%%", -1, std::int64_t{-9000000000}, 7UL, std::size_t{3}, true);
@@ -50,7 +49,7 @@ TEST(LogLineTest, ShowsNumbersByTheirOwnType) {
               ElementsAre("-1 -9000000000 7 3 1 100%", "0.500000 0.5 100000000000000000000.000000"));
 }
 
-TEST(LogLineTest, ShowsValuesListsAndWhatIsAbsent) {
+TEST(LogTest, ShowsValuesListsAndWhatIsAbsent) {
   MemoryLog log;
   const LogCategory category(log, "com.orvane.tonewerk", "twrs");
   const Value value(ValueMap{{"a", 1}});
@@ -59,7 +58,7 @@ TEST(LogLineTest, ShowsValuesListsAndWhatIsAbsent) {
   EXPECT_THAT(log.textsOf("twrs"), ElementsAre(R"({"a":1} (null) (1, 2) (null))"));
 }
 
-TEST(LogLineTest, FormatsNothingBelowTheThreshold) {
+TEST(LogTest, FormatsNothingBelowTheThreshold) {
   MemoryLog log;
   log.setThreshold("twrs", LogLevel::kError);
   const LogCategory category(log, "com.orvane.tonewerk", "twrs");

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "platform/KolviProbeMaker.h"
+#include "platform/Kolvi.h"
 
 #include <string_view>
 #include <utility>

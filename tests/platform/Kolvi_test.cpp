@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "platform/KolviProbeMaker.h"
+#include "platform/Kolvi.h"
 
 #include <gmock/gmock.h>
 
@@ -15,20 +15,20 @@ std::vector<KolviEvent> lengthOf(const std::string& signpost) { return {{signpos
 
 ValueMap interval(const char* name) { return {{"name", name}, {"type", "interval"}}; }
 
-TEST(KolviProbeMakerTest, AnArrayHoldsItsElementsAndAMapItself) {
+TEST(KolviTest, AnArrayHoldsItsElementsAndAMapItself) {
   const ValueArray list{interval("a"), interval("b")};
   EXPECT_EQ(probeDictionariesOf(list), list);
   EXPECT_EQ(probeDictionariesOf(interval("a")), ValueArray{interval("a")});
   EXPECT_EQ(probeDictionariesOf(ValueArray{}), ValueArray{});
 }
 
-TEST(KolviProbeMakerTest, AnyOtherRootHoldsNone) {
+TEST(KolviTest, AnyOtherRootHoldsNone) {
   EXPECT_EQ(probeDictionariesOf("text"), std::nullopt);
   EXPECT_EQ(probeDictionariesOf(1), std::nullopt);
   EXPECT_EQ(probeDictionariesOf(true), std::nullopt);
 }
 
-TEST(KolviProbeMakerTest, TheSignpostIsTheNameUnlessItIsGiven) {
+TEST(KolviTest, TheSignpostIsTheNameUnlessItIsGiven) {
   const ValueArray list{ValueMap{{"name", "a"}, {"type", "interval"}, {"signpost", "decode"}},
                         interval("bb")};
   EXPECT_THAT(signpostsOf(list), ElementsAre("bb", "decode"));
@@ -39,7 +39,7 @@ TEST(KolviProbeMakerTest, TheSignpostIsTheNameUnlessItIsGiven) {
   EXPECT_EQ(probes[1].events.at(0).timeDuration, 2U);
 }
 
-TEST(KolviProbeMakerTest, ChildrenMakeATree) {
+TEST(KolviTest, ChildrenMakeATree) {
   ValueMap parent = interval("parent");
   parent.set("children", ValueArray{interval("one"), interval("two")});
   const ValueArray list{ValueMap{{"name", "group"}, {"children", ValueArray{parent}}}};
@@ -54,13 +54,13 @@ TEST(KolviProbeMakerTest, ChildrenMakeATree) {
   EXPECT_EQ(probes[0].children[0].children[1].name, "two");
 }
 
-TEST(KolviProbeMakerTest, AProbeOfAnotherTypeAsksForNoSignpost) {
+TEST(KolviTest, AProbeOfAnotherTypeAsksForNoSignpost) {
   const ValueArray list{ValueMap{{"name", "a"}, {"type", "counter"}}, ValueMap{{"name", "b"}}};
   EXPECT_THAT(signpostsOf(list), IsEmpty());
   EXPECT_THAT(makeKolviProbes(list, lengthOf), SizeIs(2));
 }
 
-TEST(KolviProbeMakerTest, WhatIsNoProbeIsPassedOver) {
+TEST(KolviTest, WhatIsNoProbeIsPassedOver) {
   const ValueArray list{"text", 1, ValueMap{{"type", "interval"}}, interval("a"),
                         ValueMap{{"name", "b"}, {"children", "text"}}};
   EXPECT_THAT(signpostsOf(list), ElementsAre("a"));
@@ -69,7 +69,7 @@ TEST(KolviProbeMakerTest, WhatIsNoProbeIsPassedOver) {
   EXPECT_THAT(probes[1].children, IsEmpty());
 }
 
-TEST(KolviProbeMakerTest, AProbeDescribesItself) {
+TEST(KolviTest, AProbeDescribesItself) {
   KolviProbe probe;
   probe.name = "a";
   EXPECT_EQ(probe.description(), "probe \"a\"");
