@@ -27,8 +27,9 @@ class Benchfile {
 
   // Begins a new file, in the place of one of the same user's that stands there. Null when that fails; then
   // `systemError` is the system's error number.
-  virtual std::unique_ptr<BenchfileWriter> open(const std::string& path, std::string_view dataName,
-                                                int resultsVersion, int& systemError) = 0;
+  [[nodiscard]] virtual std::unique_ptr<BenchfileWriter> open(const std::string& path,
+                                                              std::string_view dataName, int resultsVersion,
+                                                              int& systemError) = 0;
 };
 
 }  // namespace tonewerk

@@ -64,7 +64,8 @@ class ChanmeterSample {
 
   virtual std::int32_t histogramBucketCount() const = 0;
   // 0, or an error number; the bounds are then left as they were.
-  virtual int histogramBucketBounds(std::int32_t index, std::int64_t& lower, std::int64_t& upper) const = 0;
+  [[nodiscard]] virtual int histogramBucketBounds(std::int32_t index, std::int64_t& lower,
+                                                  std::int64_t& upper) const = 0;
   virtual std::int64_t histogramBucketHits(std::int32_t index) const = 0;
   virtual std::int64_t histogramMinValue() const = 0;
   virtual std::int64_t histogramMaxValue() const = 0;
@@ -89,19 +90,19 @@ class Chanmeter {
 
   // The channels of that group and subgroup, each of them none for all. Null or, where no channel matches, an
   // empty set. An error may come with a set: some channels then could not be read.
-  virtual Channels copyChannelsInGroup(const std::optional<std::string>& group,
-                                       const std::optional<std::string>& subGroup,
-                                       std::optional<ChanmeterError>& error) = 0;
+  [[nodiscard]] virtual Channels copyChannelsInGroup(const std::optional<std::string>& group,
+                                                     const std::optional<std::string>& subGroup,
+                                                     std::optional<ChanmeterError>& error) = 0;
 
   virtual std::int32_t channelCount(const ChanmeterChannels& channels) = 0;
 
   // `subscribed` gets the channels that can be sampled, which may be fewer. Null on failure.
-  virtual Subscription createSubscription(const Channels& channels, Channels& subscribed,
-                                          std::optional<ChanmeterError>& error) = 0;
+  [[nodiscard]] virtual Subscription createSubscription(const Channels& channels, Channels& subscribed,
+                                                        std::optional<ChanmeterError>& error) = 0;
 
   // The current values. Null on failure.
-  virtual Samples createSamples(const Subscription& subscription, const Channels& subscribed,
-                                std::optional<ChanmeterError>& error) = 0;
+  [[nodiscard]] virtual Samples createSamples(const Subscription& subscription, const Channels& subscribed,
+                                              std::optional<ChanmeterError>& error) = 0;
 
   // What changed from `earlier` to `later`, channel by channel:
   //   values, hits, transitions and residencies subtract; the latter three count from zero where they went
@@ -110,8 +111,8 @@ class Chanmeter {
   //   channel that is in one of the two only gives nothing.
   // Null with kErrorNothingEarlier when `earlier` is null.
   static constexpr std::int64_t kErrorNothingEarlier = 1;
-  virtual Samples createSamplesDelta(const Samples& earlier, const Samples& later,
-                                     std::optional<ChanmeterError>& error) = 0;
+  [[nodiscard]] virtual Samples createSamplesDelta(const Samples& earlier, const Samples& later,
+                                                   std::optional<ChanmeterError>& error) = 0;
 
   // Once for each channel, in the order of the samples.
   virtual void iterate(const ChanmeterSamples& samples, const Callback& callback) = 0;

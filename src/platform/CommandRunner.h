@@ -34,7 +34,7 @@ class CommandRunner {
 
   // Runs `command` in a shell, with nothing to read and what it writes to standard error thrown away. Blocks
   // until the shell has ended, and ends with it what it left running.
-  virtual Result run(const std::string& command, const Limits& limits) = 0;
+  [[nodiscard]] virtual Result run(const std::string& command, const Limits& limits) = 0;
 };
 
 }  // namespace tonewerk

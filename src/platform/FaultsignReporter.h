@@ -57,15 +57,16 @@ class FaultsignReporter {
 
   // Captures now; `duration` in seconds. True when the parameters were accepted. The reply says whether a
   // capture was made of it; for parameters that were not accepted it may say why not.
-  virtual bool snapshotWithSignature(const FaultsignSignature& signature, double duration,
-                                     const std::optional<ValueMap>& event,
-                                     const std::optional<ValueMap>& payload, Reply reply) = 0;
+  [[nodiscard]] virtual bool snapshotWithSignature(const FaultsignSignature& signature, double duration,
+                                                   const std::optional<ValueMap>& event,
+                                                   const std::optional<ValueMap>& payload, Reply reply) = 0;
 
   // Captures when `duration` (seconds) has passed, unless the session is cancelled before. True as above.
-  virtual bool startSessionWithSignature(const FaultsignSignature& signature, double duration,
-                                         const std::optional<ValueMap>& events,
-                                         const std::optional<ValueMap>& payload,
-                                         const std::optional<ValueMap>& actions, Reply reply) = 0;
+  [[nodiscard]] virtual bool startSessionWithSignature(const FaultsignSignature& signature, double duration,
+                                                       const std::optional<ValueMap>& events,
+                                                       const std::optional<ValueMap>& payload,
+                                                       const std::optional<ValueMap>& actions,
+                                                       Reply reply) = 0;
 
   // An unknown identifier is logged and does nothing.
   virtual void cancelSession(const std::string& identifier) = 0;
@@ -77,7 +78,7 @@ class Capsa {
   virtual ~Capsa() = default;
 
   // It may outlive this one; it then refuses everything.
-  virtual std::unique_ptr<FaultsignReporter> makeReporter() = 0;
+  [[nodiscard]] virtual std::unique_ptr<FaultsignReporter> makeReporter() = 0;
 };
 
 }  // namespace tonewerk

@@ -37,8 +37,9 @@ class FileSystem {
   // A new file that is to be `name` in `directory`. Fails when it would not lie directly in `directory` (a
   // name with a slash or a zero byte, ".", ".."), when the name is too long, and with std::errc::file_exists
   // when something stands there (a symbolic link, too).
-  virtual std::unique_ptr<NewFile> createFile(const std::string& directory, const std::string& name,
-                                              std::error_code& error) = 0;
+  [[nodiscard]] virtual std::unique_ptr<NewFile> createFile(const std::string& directory,
+                                                            const std::string& name,
+                                                            std::error_code& error) = 0;
 
   // Whether something stands there; a symbolic link counts as what it leads to.
   virtual bool exists(const std::string& path) const = 0;

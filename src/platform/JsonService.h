@@ -19,10 +19,11 @@ class JsonService {
 
   // Indented over several lines, for people. None when the map holds what JSON cannot say (NaN, an infinity);
   // then `problem` names it.
-  virtual std::optional<std::string> pretty(const ValueMap& map, std::string& problem) const = 0;
+  [[nodiscard]] virtual std::optional<std::string> pretty(const ValueMap& map,
+                                                          std::string& problem) const = 0;
 
   // None when `text` is not one JSON value that values can express (null is not); then `problem` says where.
-  virtual std::optional<Value> parse(std::string_view text, std::string& problem) const = 0;
+  [[nodiscard]] virtual std::optional<Value> parse(std::string_view text, std::string& problem) const = 0;
 };
 
 }  // namespace tonewerk

@@ -56,12 +56,13 @@ class Kolvi {
   virtual ~Kolvi() = default;
 
   // Reads the trace. Null when that fails, a trace with lost events included; `problem` then says why.
-  virtual std::unique_ptr<KolviModel> openModel(const std::string& traceLocation, std::string& problem) = 0;
+  [[nodiscard]] virtual std::unique_ptr<KolviModel> openModel(const std::string& traceLocation,
+                                                              std::string& problem) = 0;
 };
 
 // The probe dictionaries that a probe list holds: an array's elements, or the one map that it is. None for
 // any other root.
-std::optional<ValueArray> probeDictionariesOf(const Value& root);
+[[nodiscard]] std::optional<ValueArray> probeDictionariesOf(const Value& root);
 
 // The signposts whose intervals the dictionaries and their children ask for.
 std::set<std::string> signpostsOf(const ValueArray& dictionaries);

@@ -43,8 +43,8 @@ class LinkReportSession {
 
   // Hands the message to every backend, which delivers it in its own time. False when one could not take it;
   // then `problem` says why, or is empty. May wait for the report store as any recording does.
-  virtual bool sendMessageWithCategory(std::uint16_t category, std::uint16_t type, const ValueMap& payload,
-                                       std::string& problem) = 0;
+  [[nodiscard]] virtual bool sendMessageWithCategory(std::uint16_t category, std::uint16_t type,
+                                                     const ValueMap& payload, std::string& problem) = 0;
 
   // What was sent goes out now instead of in a batch. Does not wait for it.
   virtual void flushMessages() = 0;
@@ -60,13 +60,12 @@ class LinkReport {
 
   // Places a session below another one in a tree of sessions, or at the root without a parent. None when the
   // service gives none.
-  virtual std::optional<std::string> newHierarchyTokenFromParentToken(
+  [[nodiscard]] virtual std::optional<std::string> newHierarchyTokenFromParentToken(
       const std::optional<std::string>& parentToken) = 0;
 
   // Never null. `frameworksToCheck` null for none.
-  virtual std::unique_ptr<LinkReportSession> initWithSessionInfo(const ValueMap& sessionInfo,
-                                                                 const ValueMap& userInfo,
-                                                                 const ValueArray* frameworksToCheck) = 0;
+  [[nodiscard]] virtual std::unique_ptr<LinkReportSession> initWithSessionInfo(
+      const ValueMap& sessionInfo, const ValueMap& userInfo, const ValueArray* frameworksToCheck) = 0;
 };
 
 }  // namespace tonewerk

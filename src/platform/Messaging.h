@@ -48,7 +48,7 @@ class MessagingListenerDelegate {
 
   // On the messaging thread, for every new connection, before anything is read from it. False turns it away.
   // The connection belongs to the listener and lives until its invalidation handler has returned.
-  virtual bool listenerShouldAcceptNewConnection(MessagingConnection& connection) = 0;
+  [[nodiscard]] virtual bool listenerShouldAcceptNewConnection(MessagingConnection& connection) = 0;
 };
 
 // The named service that clients connect to.

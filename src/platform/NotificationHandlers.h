@@ -34,9 +34,9 @@ class NotificationHandlers {
   ~NotificationHandlers();
 
   // `queue` outlives the registration, or this.
-  Token add(std::string_view name, SerialQueue& queue, Handler handler);
+  [[nodiscard]] Token add(std::string_view name, SerialQueue& queue, Handler handler);
   // None for a token that is not registered.
-  std::optional<std::string> nameOf(Token token) const;
+  [[nodiscard]] std::optional<std::string> nameOf(Token token) const;
   // See NotificationService::cancel().
   void remove(Token token);
 

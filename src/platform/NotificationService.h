@@ -34,12 +34,12 @@ class NotificationService {
 
   // Runs `handler` with the token on `queue` after every post of `name` from now on. A name is a file name:
   // not empty, no slash, not "." or "..", at most 255 bytes. `queue` must outlive the registration.
-  virtual Registration registerHandler(std::string_view name, SerialQueue& queue,
-                                       std::function<void(Token)> handler) = 0;
+  [[nodiscard]] virtual Registration registerHandler(std::string_view name, SerialQueue& queue,
+                                                     std::function<void(Token)> handler) = 0;
 
   // The state of the token's name, 0 when nobody has posted it yet; none for a token that is not registered
   // or a state that cannot be read.
-  virtual std::optional<std::uint64_t> state(Token token) const = 0;
+  [[nodiscard]] virtual std::optional<std::uint64_t> state(Token token) const = 0;
 
   // From its return on the handler does not begin, not even for a post that was already queued. On the queue
   // of the registration, or with nothing running there; also from inside the handler. An unknown token does

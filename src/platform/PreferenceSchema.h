@@ -39,6 +39,6 @@ const Preference* findPreference(std::string_view domain, std::string_view key);
 std::string typeText(const Preference& preference);
 
 // Why the preference cannot be `value`, in words that name it, or none.
-std::optional<std::string> problemWith(const Preference& preference, const Value& value);
+[[nodiscard]] std::optional<std::string> problemWith(const Preference& preference, const Value& value);
 
 }  // namespace tonewerk

@@ -21,7 +21,7 @@ class ProcessInformation {
 
   // Memory that this process keeps from others, in bytes: resident and swapped anonymous memory. On failure
   // the operating system's text of why.
-  virtual std::variant<std::uint64_t, std::string> physicalFootprint() const = 0;
+  [[nodiscard]] virtual std::variant<std::uint64_t, std::string> physicalFootprint() const = 0;
 
   // Processor time of this process so far, in microseconds (the ticks of the C library's processor clock).
   virtual std::int64_t processorTimeMicroseconds() const = 0;

@@ -64,7 +64,8 @@ class Runtrace {
   virtual ~Runtrace() = default;
 
   // Never null; what is wrong with the configuration or the service, the start's callback says.
-  virtual std::shared_ptr<RuntraceSession> makeSession(const RuntraceConfiguration& configuration) = 0;
+  [[nodiscard]] virtual std::shared_ptr<RuntraceSession> makeSession(
+      const RuntraceConfiguration& configuration) = 0;
 };
 
 }  // namespace tonewerk

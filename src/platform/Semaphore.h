@@ -23,7 +23,7 @@ class SemaphoreFactory {
   virtual ~SemaphoreFactory() = default;
 
   // Without a signal.
-  virtual std::unique_ptr<Semaphore> makeSemaphore() = 0;
+  [[nodiscard]] virtual std::unique_ptr<Semaphore> makeSemaphore() = 0;
 };
 
 }  // namespace tonewerk

@@ -43,7 +43,8 @@ class SerialQueueFactory {
   virtual ~SerialQueueFactory() = default;
 
   // `name` is for people: logs, debuggers and (shortened to 15 bytes) the thread's name.
-  virtual std::unique_ptr<SerialQueue> makeSerialQueue(std::string name, QueuePriority priority) = 0;
+  [[nodiscard]] virtual std::unique_ptr<SerialQueue> makeSerialQueue(std::string name,
+                                                                     QueuePriority priority) = 0;
 };
 
 }  // namespace tonewerk

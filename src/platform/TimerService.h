@@ -21,7 +21,8 @@ class TimerService {
 
   // Runs `tick` every `interval` on the timers' thread, first after one interval. A tick that takes longer
   // than the interval delays the next one; missed ticks are not made up for.
-  virtual std::unique_ptr<Timer> repeat(std::chrono::milliseconds interval, std::function<void()> tick) = 0;
+  [[nodiscard]] virtual std::unique_ptr<Timer> repeat(std::chrono::milliseconds interval,
+                                                      std::function<void()> tick) = 0;
 };
 
 }  // namespace tonewerk

@@ -26,6 +26,7 @@ ValueMap featureTable();
 
 // The notification that announces a change of this preference to the system monitor; none for one that it
 // does not follow.
-std::optional<std::string> notificationOfPreference(std::string_view domain, std::string_view key);
+[[nodiscard]] std::optional<std::string> notificationOfPreference(std::string_view domain,
+                                                                  std::string_view key);
 
 }  // namespace tonewerk

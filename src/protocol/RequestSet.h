@@ -71,7 +71,7 @@ struct Method {
 struct RequestSet {
   std::vector<Method> methods;
 
-  std::optional<std::size_t> find(std::string_view name) const;
+  [[nodiscard]] std::optional<std::size_t> find(std::string_view name) const;
 };
 
 // What a request brought for one parameter; none when it brought nothing where that is allowed.
@@ -80,7 +80,7 @@ using Arguments = std::vector<Argument>;
 
 // What is wrong with `arguments` for `method` in words that name the argument, or none. A handler gets only
 // requests with which nothing is wrong.
-std::optional<std::string> problemWith(const Method& method, const Arguments& arguments);
+[[nodiscard]] std::optional<std::string> problemWith(const Method& method, const Arguments& arguments);
 
 // An error answer.
 struct ReplyError {
@@ -104,6 +104,7 @@ ReplyError messagingError(std::int64_t code, std::string message);
 inline constexpr std::uint32_t kNoUser = 0xFFFF'FFFF;
 
 // Why a peer of that user may not call `method` in a daemon that runs as `owner`, or none.
-std::optional<ReplyError> problemWithCaller(const Method& method, std::uint32_t user, std::uint32_t owner);
+[[nodiscard]] std::optional<ReplyError> problemWithCaller(const Method& method, std::uint32_t user,
+                                                          std::uint32_t owner);
 
 }  // namespace tonewerk

@@ -37,7 +37,7 @@ std::pair<int, int> listenOnLoopback() {
   return {descriptor, listens ? ntohs(address.sin_port) : 0};
 }
 
-bool sendAll(int connection, std::string_view bytes) {
+[[nodiscard]] bool sendAll(int connection, std::string_view bytes) {
   while (!bytes.empty()) {
     const ssize_t sent = ::send(connection, bytes.data(), bytes.size(), MSG_NOSIGNAL);
     if (sent <= 0) return false;
@@ -75,7 +75,7 @@ void parseHead(std::string_view head, OtlpReceiver::Request& request) {
 }
 
 // The unpacked body; false when it is not gzip.
-bool unpack(const std::string& packed, std::string& body) {
+[[nodiscard]] bool unpack(const std::string& packed, std::string& body) {
   z_stream stream{};
   if (inflateInit2(&stream, 15 + 16) != Z_OK) return false;
   stream.next_in = reinterpret_cast<Bytef*>(const_cast<char*>(packed.data()));
@@ -228,7 +228,7 @@ void OtlpReceiver::send(int connection, const Answer& answer) {
     case Fault::kCloseEarly:
       return;
     case Fault::kGarbage:
-      sendAll(connection, "\x16\x03\x01 what? \r\n\r\n");
+      (void)sendAll(connection, "\x16\x03\x01 what? \r\n\r\n");  // the peer may already be gone
       return;
     case Fault::kHugeBody:
       return sendForever(connection, statusLine + "Content-Length: 100000000\r\n\r\n");
@@ -243,7 +243,7 @@ void OtlpReceiver::send(int connection, const Answer& answer) {
                      "Connection: close\r\nContent-Length: " + std::to_string(answer.body.size() + more) +
                      "\r\n";
   for (const std::string& header : answer.headers) text += header + "\r\n";
-  sendAll(connection, text + "\r\n" + answer.body);
+  (void)sendAll(connection, text + "\r\n" + answer.body);  // the peer may already be gone
 }
 
 // Until the peer has had enough.

@@ -61,7 +61,7 @@ class OtlpReceiver {
   void answerNext(Answer answer);
 
   // Until there were so many requests, for seconds at most; false when there were fewer.
-  bool waitForRequests(std::size_t count);
+  [[nodiscard]] bool waitForRequests(std::size_t count);
   std::vector<Request> requests() const;
   // Of all requests: the log records that were accepted or not.
   std::vector<nlohmann::json> records() const;
@@ -71,12 +71,12 @@ class OtlpReceiver {
  private:
   void run();
   void serve(int connection);
-  bool readRequest(int connection, Request& request);
+  [[nodiscard]] bool readRequest(int connection, Request& request);
   void check(Request& request);
   void send(int connection, const Answer& answer);
   void sendForever(int connection, const std::string& beginning);
   void waitForPeer(int connection);
-  bool waitReadable(int descriptor);
+  [[nodiscard]] bool waitReadable(int descriptor);
 
   int listener_ = -1;
   int port_ = 0;

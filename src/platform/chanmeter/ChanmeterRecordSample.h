@@ -33,7 +33,8 @@ class ChanmeterRecordSample final : public ChanmeterSample {
   double stateDutyCycle(std::int32_t index) const override;
 
   std::int32_t histogramBucketCount() const override;
-  int histogramBucketBounds(std::int32_t index, std::int64_t& lower, std::int64_t& upper) const override;
+  [[nodiscard]] int histogramBucketBounds(std::int32_t index, std::int64_t& lower,
+                                          std::int64_t& upper) const override;
   std::int64_t histogramBucketHits(std::int32_t index) const override;
   std::int64_t histogramMinValue() const override;
   std::int64_t histogramMaxValue() const override;

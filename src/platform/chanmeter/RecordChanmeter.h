@@ -11,8 +11,8 @@ class RecordChanmeter : public Chanmeter {
  public:
   std::int32_t channelCount(const ChanmeterChannels& channels) override;
   // `later` is not null.
-  Samples createSamplesDelta(const Samples& earlier, const Samples& later,
-                             std::optional<ChanmeterError>& error) override;
+  [[nodiscard]] Samples createSamplesDelta(const Samples& earlier, const Samples& later,
+                                           std::optional<ChanmeterError>& error) override;
   void iterate(const ChanmeterSamples& samples, const Callback& callback) override;
 };
 

@@ -18,7 +18,7 @@ class AudioIssueDetected final : public PB::Base {
  public:
   static constexpr std::uint32_t kMetricIdentifier = 0x5B0003;
 
-  bool readFrom(PB::Reader& reader) override;
+  [[nodiscard]] bool readFrom(PB::Reader& reader) override;
   void writeTo(PB::Writer& writer) const override;
   void formatText(PB::TextFormatter& formatter, std::string_view name) const override;
 

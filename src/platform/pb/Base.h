@@ -16,7 +16,7 @@ class Base {
 
   // Takes the fields that the input holds and leaves the others as they are. Ends at the end of the input, at
   // an end-group key, or at an error: then it is false, and what was read before it stays.
-  virtual bool readFrom(Reader& reader) = 0;
+  [[nodiscard]] virtual bool readFrom(Reader& reader) = 0;
   virtual void writeTo(Writer& writer) const = 0;
   virtual void formatText(TextFormatter& formatter, std::string_view name) const = 0;
 

@@ -21,14 +21,14 @@ class Reader {
   virtual ~Reader() = default;
 
   // None at the end of the input and on an error.
-  virtual std::optional<Key> nextKey() = 0;
+  [[nodiscard]] virtual std::optional<Key> nextKey() = 0;
 
   // The value behind the key that was read last; each fails when the input ends within it. A varint has at
   // most ten bytes.
-  virtual std::optional<std::uint64_t> readVarint() = 0;
-  virtual std::optional<std::string> readBytes() = 0;
+  [[nodiscard]] virtual std::optional<std::uint64_t> readVarint() = 0;
+  [[nodiscard]] virtual std::optional<std::string> readBytes() = 0;
   // A group is skipped up to its end.
-  virtual bool skip(const Key& key) = 0;
+  [[nodiscard]] virtual bool skip(const Key& key) = 0;
 
   virtual bool hasError() const = 0;
 };

@@ -47,8 +47,8 @@ class ReportingClient : public RpcClient {
  private:
   struct Connection;
 
-  std::error_code send(std::string_view frame);
-  std::error_code receive(std::chrono::milliseconds timeout) override;
+  [[nodiscard]] std::error_code send(std::string_view frame);
+  [[nodiscard]] std::error_code receive(std::chrono::milliseconds timeout) override;
 
   std::unique_ptr<Connection> connection_;
   std::string socketPath_;

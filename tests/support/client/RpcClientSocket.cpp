@@ -38,7 +38,7 @@ timeval timevalOf(milliseconds timeout) {
 }
 
 // Waits until the socket is ready for one of `events`; 0 when the time is up first.
-short waitFor(int descriptor, short events, milliseconds timeout, std::error_code& error) {
+[[nodiscard]] short waitFor(int descriptor, short events, milliseconds timeout, std::error_code& error) {
   const auto until = std::chrono::steady_clock::now() + timeout;
   for (;;) {
     pollfd polled{descriptor, events, 0};

@@ -37,8 +37,8 @@ class RpcClientSocket {
   std::deque<RpcFrame>& arrived() { return arrived_; }
 
  private:
-  std::error_code takeIn();
-  std::error_code decode(std::string_view bytes);
+  [[nodiscard]] std::error_code takeIn();
+  [[nodiscard]] std::error_code decode(std::string_view bytes);
 
   FileDescriptor socket_;
   RpcStrings texts_;

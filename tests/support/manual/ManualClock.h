@@ -46,7 +46,7 @@ class ManualClock final : public Clock {
   void advance(double seconds);
   // As advance(duration), but no further than to where `isDone` says so, which is asked at the beginning and
   // after everything that was due. True when it did.
-  bool advanceUntil(std::chrono::nanoseconds duration, const std::function<bool()>& isDone);
+  [[nodiscard]] bool advanceUntil(std::chrono::nanoseconds duration, const std::function<bool()>& isDone);
   void setNow(double seconds);
   void setUtcOffset(std::chrono::minutes offset);
 

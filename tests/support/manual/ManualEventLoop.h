@@ -17,12 +17,12 @@ class ManualEventLoop final : public EventLoop, private ManualClock::Alarm {
   explicit ManualEventLoop(ManualClock& clock);
   ~ManualEventLoop() override;
 
-  std::unique_ptr<Source> watch(int descriptor, std::function<void()> onReadable) override;
-  std::unique_ptr<Timer> makeTimer(std::function<void()> onExpired) override;
+  [[nodiscard]] std::unique_ptr<Source> watch(int descriptor, std::function<void()> onReadable) override;
+  [[nodiscard]] std::unique_ptr<Timer> makeTimer(std::function<void()> onExpired) override;
 
   // Waits, for seconds at most, until a watched descriptor is readable, and runs its callback. False when
   // none was.
-  bool runReadable();
+  [[nodiscard]] bool runReadable();
 
  private:
   class ManualSource;

@@ -21,7 +21,8 @@ namespace tonewerk {
 // One thread. Outlives its queues.
 class ManualQueues final : public SerialQueueFactory {
  public:
-  std::unique_ptr<SerialQueue> makeSerialQueue(std::string name, QueuePriority priority) override;
+  [[nodiscard]] std::unique_ptr<SerialQueue> makeSerialQueue(std::string name,
+                                                             QueuePriority priority) override;
 
   // Null when no living queue has the name; the first of several.
   ManualSerialQueue* find(std::string_view name) const;

@@ -15,12 +15,12 @@ class ManualSemaphore final : public Semaphore {
     ++count_;
   }
 
-  bool wait(std::chrono::nanoseconds timeout) override {
+  [[nodiscard]] bool wait(std::chrono::nanoseconds timeout) override {
     return clock_.advanceUntil(timeout, [this] { return take(); });
   }
 
  private:
-  bool take() {
+  [[nodiscard]] bool take() {
     const MutexLock lock(mutex_);
     if (count_ == 0) return false;
     --count_;

@@ -20,7 +20,7 @@ class ManualSemaphores final : public SemaphoreFactory {
   // `clock` outlives the semaphores.
   explicit ManualSemaphores(ManualClock& clock) : clock_(clock) {}
 
-  std::unique_ptr<Semaphore> makeSemaphore() override;
+  [[nodiscard]] std::unique_ptr<Semaphore> makeSemaphore() override;
 
  private:
   ManualClock& clock_;

@@ -29,7 +29,8 @@ class ManualTimers final : public TimerService, private ManualClock::Alarm {
   ManualTimers& operator=(const ManualTimers&) = delete;
   ~ManualTimers() override { clock_.removeAlarm(*this); }
 
-  std::unique_ptr<Timer> repeat(std::chrono::milliseconds interval, std::function<void()> tick) override;
+  [[nodiscard]] std::unique_ptr<Timer> repeat(std::chrono::milliseconds interval,
+                                              std::function<void()> tick) override;
 
   // How many timers exist.
   std::size_t count() const;

@@ -16,7 +16,7 @@ class MemoryWriter final : public BenchfileWriter {
   void newValue(std::string_view name, double milliseconds) override {
     text_ += std::string(name) + " " + Value(milliseconds).text() + "\n";
   }
-  std::error_code close() override {
+  [[nodiscard]] std::error_code close() override {
     if (failure_ != std::errc()) return std::make_error_code(failure_);
     files_.addFile(path_, text_);
     return {};

@@ -17,8 +17,8 @@ class MemoryBenchfile final : public Benchfile {
   // `files` outlives this.
   explicit MemoryBenchfile(MemoryFileSystem& files) : files_(files) {}
 
-  std::unique_ptr<BenchfileWriter> open(const std::string& path, std::string_view dataName,
-                                        int resultsVersion, int& systemError) override;
+  [[nodiscard]] std::unique_ptr<BenchfileWriter> open(const std::string& path, std::string_view dataName,
+                                                      int resultsVersion, int& systemError) override;
 
   int openFailure = 0;       // opening fails with this error number
   std::errc closeFailure{};  // closing fails with it

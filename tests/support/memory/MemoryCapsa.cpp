@@ -30,16 +30,16 @@ class MemoryCapsa::MemoryReporter final : public FaultsignReporter {
             std::move(detectedProcess), std::move(triggerThresholdValues)};
   }
 
-  bool snapshotWithSignature(const FaultsignSignature& signature, double duration,
-                             const std::optional<ValueMap>& event, const std::optional<ValueMap>& payload,
-                             Reply reply) override {
+  [[nodiscard]] bool snapshotWithSignature(const FaultsignSignature& signature, double duration,
+                                           const std::optional<ValueMap>& event,
+                                           const std::optional<ValueMap>& payload, Reply reply) override {
     return take({true, signature, duration, event, payload, std::nullopt, std::move(reply)});
   }
 
-  bool startSessionWithSignature(const FaultsignSignature& signature, double duration,
-                                 const std::optional<ValueMap>& events,
-                                 const std::optional<ValueMap>& payload,
-                                 const std::optional<ValueMap>& actions, Reply reply) override {
+  [[nodiscard]] bool startSessionWithSignature(const FaultsignSignature& signature, double duration,
+                                               const std::optional<ValueMap>& events,
+                                               const std::optional<ValueMap>& payload,
+                                               const std::optional<ValueMap>& actions, Reply reply) override {
     return take({false, signature, duration, events, payload, actions, std::move(reply)});
   }
 
@@ -49,7 +49,7 @@ class MemoryCapsa::MemoryReporter final : public FaultsignReporter {
   }
 
  private:
-  bool take(const Request& request) {
+  [[nodiscard]] bool take(const Request& request) {
     ReplyMap reply;
     {
       const MutexLock lock(state_->mutex);

@@ -33,7 +33,7 @@ class MemoryCapsa final : public Capsa {
   MemoryCapsa();
   ~MemoryCapsa() override;
 
-  std::unique_ptr<FaultsignReporter> makeReporter() override;
+  [[nodiscard]] std::unique_ptr<FaultsignReporter> makeReporter() override;
 
   // From now on parameters are not accepted.
   void refuse();

@@ -51,15 +51,15 @@ class MemoryChanmeter final : public RecordChanmeter {
   // Samples and deltas that somebody still holds.
   std::size_t heldSamples() const;
 
-  Channels copyChannelsInGroup(const std::optional<std::string>& group,
-                               const std::optional<std::string>& subGroup,
-                               std::optional<ChanmeterError>& error) override;
-  Subscription createSubscription(const Channels& channels, Channels& subscribed,
-                                  std::optional<ChanmeterError>& error) override;
-  Samples createSamples(const Subscription& subscription, const Channels& subscribed,
-                        std::optional<ChanmeterError>& error) override;
-  Samples createSamplesDelta(const Samples& earlier, const Samples& later,
-                             std::optional<ChanmeterError>& error) override;
+  [[nodiscard]] Channels copyChannelsInGroup(const std::optional<std::string>& group,
+                                             const std::optional<std::string>& subGroup,
+                                             std::optional<ChanmeterError>& error) override;
+  [[nodiscard]] Subscription createSubscription(const Channels& channels, Channels& subscribed,
+                                                std::optional<ChanmeterError>& error) override;
+  [[nodiscard]] Samples createSamples(const Subscription& subscription, const Channels& subscribed,
+                                      std::optional<ChanmeterError>& error) override;
+  [[nodiscard]] Samples createSamplesDelta(const Samples& earlier, const Samples& later,
+                                           std::optional<ChanmeterError>& error) override;
 
  private:
   struct Rule {

@@ -23,7 +23,7 @@ class MemoryCommandRunner final : public CommandRunner {
     Limits limits;
   };
 
-  Result run(const std::string& command, const Limits& limits) override;
+  [[nodiscard]] Result run(const std::string& command, const Limits& limits) override;
 
   void answer(const std::string& command, Result result);
   void answer(const std::string& command, std::string output) {

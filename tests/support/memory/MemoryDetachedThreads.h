@@ -25,7 +25,7 @@ class MemoryDetachedThreads final : public DetachedThreads {
     for (std::thread& thread : threads_) thread.join();
   }
 
-  std::error_code start(std::string_view name, Task work) override {
+  [[nodiscard]] std::error_code start(std::string_view name, Task work) override {
     const MutexLock lock(mutex_);
     if (const auto refusal = refusals_.find(name); refusal != refusals_.end()) {
       return std::make_error_code(refusal->second);

@@ -27,7 +27,7 @@ class MemoryFileSystem::File final : public NewFile {
     if (!isPlaced_) --state_->openFiles;
   }
 
-  std::error_code write(std::string_view text) override {
+  [[nodiscard]] std::error_code write(std::string_view text) override {
     const MutexLock lock(state_->mutex);
     assert(!isPlaced_);
     if (state_->writesUntilFailure > 0 && --state_->writesUntilFailure == 0) {
@@ -38,7 +38,7 @@ class MemoryFileSystem::File final : public NewFile {
     return {};
   }
 
-  std::error_code place(const std::string& name) override {
+  [[nodiscard]] std::error_code place(const std::string& name) override {
     const MutexLock lock(state_->mutex);
     assert(!isPlaced_);
     if (!isPlainName(name)) return std::make_error_code(std::errc::invalid_argument);

@@ -25,13 +25,13 @@ class MemoryFileSystem final : public FileSystem {
  public:
   MemoryFileSystem();
 
-  std::error_code createDirectories(const std::string& path, unsigned mode) override;
-  std::unique_ptr<NewFile> createFile(const std::string& directory, const std::string& name,
-                                      std::error_code& error) override;
+  [[nodiscard]] std::error_code createDirectories(const std::string& path, unsigned mode) override;
+  [[nodiscard]] std::unique_ptr<NewFile> createFile(const std::string& directory, const std::string& name,
+                                                    std::error_code& error) override;
   bool exists(const std::string& path) const override;
-  std::error_code readFile(const std::string& path, std::string& text) const override;
-  std::error_code moveFile(const std::string& from, const std::string& directory,
-                           const std::string& name) override;
+  [[nodiscard]] std::error_code readFile(const std::string& path, std::string& text) const override;
+  [[nodiscard]] std::error_code moveFile(const std::string& from, const std::string& directory,
+                                         const std::string& name) override;
 
   // std::errc() makes the call succeed again.
   void failCreateDirectories(std::errc error);

@@ -32,7 +32,7 @@ class MemoryIssueDraftService final : public IssueDraftService {
   // Requests that nobody has answered.
   std::size_t unanswered() const;
   // Runs the oldest unanswered request's handler here. False when there is none.
-  bool answerNext(const std::optional<std::string>& error = std::nullopt);
+  [[nodiscard]] bool answerNext(const std::optional<std::string>& error = std::nullopt);
 
  private:
   mutable Mutex mutex_;

@@ -10,8 +10,8 @@ namespace tonewerk {
 class MemoryJsonService final : public JsonService {
  public:
   std::string compact(const ValueMap& map) const override;
-  std::optional<std::string> pretty(const ValueMap& map, std::string& problem) const override;
-  std::optional<Value> parse(std::string_view text, std::string& problem) const override;
+  [[nodiscard]] std::optional<std::string> pretty(const ValueMap& map, std::string& problem) const override;
+  [[nodiscard]] std::optional<Value> parse(std::string_view text, std::string& problem) const override;
 };
 
 }  // namespace tonewerk

@@ -19,7 +19,8 @@ class MemoryKolvi final : public Kolvi {
  public:
   static constexpr double kUnitSeconds = 1e-6;
 
-  std::unique_ptr<KolviModel> openModel(const std::string& traceLocation, std::string& problem) override;
+  [[nodiscard]] std::unique_ptr<KolviModel> openModel(const std::string& traceLocation,
+                                                      std::string& problem) override;
 
   std::map<std::string, std::vector<std::uint64_t>> intervals;  // by signpost
   std::optional<std::string> failure;                           // opening fails with it

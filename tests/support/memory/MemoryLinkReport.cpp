@@ -39,8 +39,8 @@ class MemoryLinkReport::MemorySession final : public LinkReportSession {
     handler(std::move(backends));
   }
 
-  bool sendMessageWithCategory(std::uint16_t category, std::uint16_t type, const ValueMap& payload,
-                               std::string& problem) override {
+  [[nodiscard]] bool sendMessageWithCategory(std::uint16_t category, std::uint16_t type,
+                                             const ValueMap& payload, std::string& problem) override {
     const MutexLock lock(state_->mutex);
     if (state_->problem) {
       problem = *state_->problem;

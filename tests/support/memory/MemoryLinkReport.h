@@ -40,11 +40,10 @@ class MemoryLinkReport final : public LinkReport {
   MemoryLinkReport();
   ~MemoryLinkReport() override;
 
-  std::optional<std::string> newHierarchyTokenFromParentToken(
+  [[nodiscard]] std::optional<std::string> newHierarchyTokenFromParentToken(
       const std::optional<std::string>& parentToken) override;
-  std::unique_ptr<LinkReportSession> initWithSessionInfo(const ValueMap& sessionInfo,
-                                                         const ValueMap& userInfo,
-                                                         const ValueArray* frameworksToCheck) override;
+  [[nodiscard]] std::unique_ptr<LinkReportSession> initWithSessionInfo(
+      const ValueMap& sessionInfo, const ValueMap& userInfo, const ValueArray* frameworksToCheck) override;
 
   // From now on sessions get these backends as soon as they ask; at the beginning {"memory"}.
   void answerAtOnce(LinkReportSession::Backends backends);

@@ -45,8 +45,8 @@ class MemoryClient {
   // object, waitForResponses() says when to look.
   std::optional<MemoryResponse> responseTo(std::uint32_t identifier) const;
   // Returns true as soon as there are `count` answers, false when that has not happened within `timeout`.
-  bool waitForResponses(std::size_t count,
-                        std::chrono::milliseconds timeout = std::chrono::seconds(30)) const;
+  [[nodiscard]] bool waitForResponses(std::size_t count,
+                                      std::chrono::milliseconds timeout = std::chrono::seconds(30)) const;
 
   // Requests whose bodies have not run yet.
   std::size_t unfinishedRequests() const;
@@ -74,8 +74,8 @@ class MemoryMessaging final : public MessagingListener {
   static constexpr std::uint32_t kOwner = 500;
 
   // A client process of that user connects. Null when nobody listens or the delegate turns it away.
-  std::unique_ptr<MemoryClient> connect(std::int32_t processIdentifier = 1000,
-                                        std::uint32_t userIdentifier = kOwner);
+  [[nodiscard]] std::unique_ptr<MemoryClient> connect(std::int32_t processIdentifier = 1000,
+                                                      std::uint32_t userIdentifier = kOwner);
 
  private:
   MessagingListenerDelegate* delegate_ = nullptr;

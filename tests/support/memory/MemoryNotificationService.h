@@ -25,14 +25,14 @@ namespace tonewerk {
 //   notifications.failRegistrations(NotificationService::kStatusFailed);
 class MemoryNotificationService final : public NotificationService {
  public:
-  Registration registerHandler(std::string_view name, SerialQueue& queue,
-                               std::function<void(Token)> handler) override;
-  std::optional<std::uint64_t> state(Token token) const override;
+  [[nodiscard]] Registration registerHandler(std::string_view name, SerialQueue& queue,
+                                             std::function<void(Token)> handler) override;
+  [[nodiscard]] std::optional<std::uint64_t> state(Token token) const override;
   void cancel(Token token) override;
-  std::error_code post(std::string_view name) override;
+  [[nodiscard]] std::error_code post(std::string_view name) override;
 
   // The same with a new state, as somebody else does it.
-  std::error_code post(std::string_view name, std::uint64_t state);
+  [[nodiscard]] std::error_code post(std::string_view name, std::uint64_t state);
   // Its state cannot be read until somebody posts one.
   void makeUnreadable(std::string_view name);
   // kStatusOk makes registrations succeed again.

@@ -18,10 +18,10 @@ class MemoryPreferenceStore final : public PreferenceStore {
  public:
   std::optional<Value> read(std::string_view domain, std::string_view key) const override;
   ValueMap readAll(std::string_view domain) const override;
-  std::error_code write(std::string_view domain, std::string_view key, const Value& value,
-                        std::string* problem = nullptr) override;
-  std::error_code remove(std::string_view domain, std::string_view key,
-                         std::string* problem = nullptr) override;
+  [[nodiscard]] std::error_code write(std::string_view domain, std::string_view key, const Value& value,
+                                      std::string* problem = nullptr) override;
+  [[nodiscard]] std::error_code remove(std::string_view domain, std::string_view key,
+                                       std::string* problem = nullptr) override;
 
   void configure(std::string_view domain, std::string_view key, const Value& value);
   // std::errc() makes writes succeed again.
@@ -36,7 +36,8 @@ class MemoryPreferenceStore final : public PreferenceStore {
   };
 
   const Domain* find(std::string_view domain) const REQUIRES(mutex_);
-  std::error_code checkWrite(std::string_view domain, std::string* problem) const REQUIRES(mutex_);
+  [[nodiscard]] std::error_code checkWrite(std::string_view domain, std::string* problem) const
+      REQUIRES(mutex_);
 
   mutable Mutex mutex_;
   std::map<std::string, Domain, std::less<>> domains_ GUARDED_BY(mutex_);

@@ -24,7 +24,7 @@ class MemoryProcessInformation final : public ProcessInformation {
     return found == names_.end() ? std::nullopt : std::optional(found->second);
   }
   std::int32_t ownProcessIdentifier() const override { return kOwnProcessIdentifier; }
-  std::variant<std::uint64_t, std::string> physicalFootprint() const override {
+  [[nodiscard]] std::variant<std::uint64_t, std::string> physicalFootprint() const override {
     const MutexLock lock(mutex_);
     return footprint_;
   }

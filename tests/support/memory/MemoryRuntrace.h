@@ -50,7 +50,8 @@ class MemoryRuntrace final : public Runtrace, private ManualClock::Alarm {
   MemoryRuntrace& operator=(const MemoryRuntrace&) = delete;
   ~MemoryRuntrace() override;
 
-  std::shared_ptr<RuntraceSession> makeSession(const RuntraceConfiguration& configuration) override;
+  [[nodiscard]] std::shared_ptr<RuntraceSession> makeSession(
+      const RuntraceConfiguration& configuration) override;
 
   // For the starts and stops from now on.
   void onStart(Callbacks callbacks) { onStart_ = std::move(callbacks); }

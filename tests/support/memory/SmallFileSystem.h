@@ -25,7 +25,9 @@ class SmallFileSystem {
 
   bool isMounted() const { return isMounted_; }
   // Makes room.
-  bool grow() { return ::mount("tonewerk-test", path_.c_str(), "tmpfs", MS_REMOUNT, "size=64m") == 0; }
+  [[nodiscard]] bool grow() {
+    return ::mount("tonewerk-test", path_.c_str(), "tmpfs", MS_REMOUNT, "size=64m") == 0;
+  }
 
  private:
   const std::string path_;

@@ -288,12 +288,12 @@ TEST_F(LinuxCapsaTest, ThreadsThatAskTogetherGetTheDaysCapturesAndNoMore) {
   const auto ask = [&](const std::string& name) {
     const auto own = capsa->makeReporter();
     for (int n = 0; n < 15; ++n) {
-      own->startSessionWithSignature(signatureOf(name + std::to_string(n)), 3600.0, {}, {}, {},
-                                     [&](const std::optional<ValueMap>& reply) {
-                                       if (!reply->boolean(kFaultsignReplySuccess)) return;
-                                       ++started;
-                                       own->cancelSession(reply->text(kFaultsignReplySessionID));
-                                     });
+      EXPECT_TRUE(own->startSessionWithSignature(signatureOf(name + std::to_string(n)), 3600.0, {}, {}, {},
+                                                 [&](const std::optional<ValueMap>& reply) {
+                                                   if (!reply->boolean(kFaultsignReplySuccess)) return;
+                                                   ++started;
+                                                   own->cancelSession(reply->text(kFaultsignReplySessionID));
+                                                 }));
     }
   };
   std::thread one([&] { ask("one"); });

@@ -155,9 +155,10 @@ TYPED_TEST(NotificationServiceContract, PostsOneAfterTheOtherAreEachTold) {
 
 TYPED_TEST(NotificationServiceContract, AHandlerSeesTheStateOfThePostItIsToldOf) {
   const auto seen = std::make_shared<std::optional<std::uint64_t>>();
-  this->service().registerHandler(kName, this->queue_, [this, seen](Token token) {
+  const auto registration = this->service().registerHandler(kName, this->queue_, [this, seen](Token token) {
     this->change([&] { *seen = this->service().state(token); });
   });
+  EXPECT_EQ(registration.status, NotificationService::kStatusOk);
   EXPECT_FALSE(this->post(kName, 7));
   EXPECT_TRUE(this->waitUntil([&] { return *seen == std::optional<std::uint64_t>(7); }));
 }
@@ -189,10 +190,11 @@ TYPED_TEST(NotificationServiceContract, WhatIsCancelledIsNotToldAndHasNoState) {
 TYPED_TEST(NotificationServiceContract, AHandlerMayCancelItsOwnToken) {
   const auto told = this->newCount();
   const auto witness = this->newCount();
-  this->service().registerHandler(kName, this->queue_, [this, told](Token token) {
+  const auto registration = this->service().registerHandler(kName, this->queue_, [this, told](Token token) {
     this->service().cancel(token);
     this->increase(told);
   });
+  EXPECT_EQ(registration.status, NotificationService::kStatusOk);
   this->count(kName, witness);
   for (int post = 0; post < 3; ++post) this->postAndWait(kName, witness);
   EXPECT_EQ(this->valueOf(told), 1);
@@ -219,23 +221,25 @@ TYPED_TEST(NotificationServiceContract, AHandlerThatIsQueuedAlreadyDoesNotBeginO
 
 TYPED_TEST(NotificationServiceContract, AHandlerMayRegisterAndPost) {
   const auto told = this->newCount();
-  this->service().registerHandler(kName, this->queue_, [this, told](Token token) {
+  const auto registration = this->service().registerHandler(kName, this->queue_, [this, told](Token token) {
     this->service().cancel(token);
     this->count(kOther, told);
     EXPECT_FALSE(this->service().post(kOther));
   });
+  EXPECT_EQ(registration.status, NotificationService::kStatusOk);
   EXPECT_FALSE(this->service().post(kName));
   EXPECT_TRUE(this->waitUntil([&] { return *told > 0; }));
 }
 
 TYPED_TEST(NotificationServiceContract, APostDuringTheHandlerIsToldAgain) {
   const auto told = this->newCount();
-  this->service().registerHandler(kName, this->queue_, [this, told](Token) {
+  const auto registration = this->service().registerHandler(kName, this->queue_, [this, told](Token) {
     if (this->valueOf(told) == 0) {
       EXPECT_FALSE(this->service().post(kName));
     }
     this->increase(told);
   });
+  EXPECT_EQ(registration.status, NotificationService::kStatusOk);
   EXPECT_FALSE(this->service().post(kName));
   EXPECT_TRUE(this->waitUntil([&] { return *told >= 2; }));
 }
