@@ -8,25 +8,25 @@
 
 namespace tonewerk {
 
-// A benchmark data file being written. One thread. Destroyed without close() it leaves no file.
+// Writes a benchmark data file. One thread. Destroying it without close() leaves no file.
 class BenchfileWriter {
  public:
   virtual ~BenchfileWriter() = default;
 
-  // One measurement of what `name` stands for, in milliseconds; names repeat. A failure shows at close().
+  // Adds one measurement of `name`, in milliseconds. A name may repeat. close() reports a failure.
   virtual void newValue(std::string_view name, double milliseconds) = 0;
 
-  // Once. With an error there is no file.
+  // Finishes the file. Call once. After an error there is no file.
   [[nodiscard]] virtual std::error_code close() = 0;
 };
 
-// The benchmark data writer. Any thread.
+// Makes benchmark data files. Any thread.
 class Benchfile {
  public:
   virtual ~Benchfile() = default;
 
-  // Begins a new file, in the place of one of the same user's that stands there. Null when that fails; then
-  // `systemError` is the system's error number.
+  // Begins a new file. It replaces a file of the same user at `path`. Returns null on failure; `systemError`
+  // is then the system's error number.
   [[nodiscard]] virtual std::unique_ptr<BenchfileWriter> open(const std::string& path,
                                                               std::string_view dataName, int resultsVersion,
                                                               int& systemError) = 0;

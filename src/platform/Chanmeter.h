@@ -10,12 +10,12 @@
 
 namespace tonewerk {
 
-// The driver-statistics library: channels that drivers publish, each known by driver, group, subgroup and
-// name, with a value that is one number, a histogram or a set of states.
+// The driver-statistics library gives access to channels that drivers publish. A channel is identified by
+// driver, group, subgroup and name; its value is one number, a histogram or a set of states.
 //
-// Any thread; what it returns is immutable, so that it may be shared between threads.
+// Any thread. Everything that it returns is immutable, so that threads may share it.
 
-// As channels say it themselves; a number above kSimpleArray is a format that this side does not know.
+// A channel's own statement of its format. This side does not know formats above kSimpleArray.
 using ChanmeterFormat = std::uint8_t;
 inline constexpr ChanmeterFormat kChanmeterFormatInvalid = 0;
 inline constexpr ChanmeterFormat kChanmeterFormatSimple = 1;
@@ -23,26 +23,26 @@ inline constexpr ChanmeterFormat kChanmeterFormatState = 2;
 inline constexpr ChanmeterFormat kChanmeterFormatHistogram = 3;
 inline constexpr ChanmeterFormat kChanmeterFormatSimpleArray = 4;
 
-// What went wrong. Where a function takes one to fill, it sets it or leaves it alone.
+// What went wrong. A function with an error parameter sets it on an error and otherwise leaves it unchanged.
 struct ChanmeterError {
   std::int64_t code = 0;
 };
 
-// Which channels there are; made by the library alone.
+// A set of channels. Only the library makes it.
 class ChanmeterChannels {
  public:
   virtual ~ChanmeterChannels() = default;
 };
 
-// What was subscribed; made by the library alone.
+// A subscription to channels. Only the library makes it.
 class ChanmeterSubscription {
  public:
   virtual ~ChanmeterSubscription() = default;
 };
 
-// One channel's value in a set of samples. Units are the driver's; the label says which. Where a question
-// does not fit the sample's format, or an index is out of range, the answer is 0 or empty. Texts live as long
-// as the sample does.
+// Gives one channel's value in a set of samples. The driver chooses units; the label names them. An accessor
+// that does not fit the sample's format, or gets an index out of range, returns 0 or an empty text. Texts
+// live as long as the sample.
 class ChanmeterSample {
  public:
   virtual ~ChanmeterSample() = default;
@@ -63,7 +63,7 @@ class ChanmeterSample {
   virtual double stateDutyCycle(std::int32_t index) const = 0;
 
   virtual std::int32_t histogramBucketCount() const = 0;
-  // 0, or an error number; the bounds are then left as they were.
+  // Returns 0, or an error number; the bounds are then unchanged.
   [[nodiscard]] virtual int histogramBucketBounds(std::int32_t index, std::int64_t& lower,
                                                   std::int64_t& upper) const = 0;
   virtual std::int64_t histogramBucketHits(std::int32_t index) const = 0;
@@ -71,8 +71,8 @@ class ChanmeterSample {
   virtual std::int64_t histogramMaxValue() const = 0;
 };
 
-// The values of all subscribed channels at one time, or the changes between two times; made by the library
-// alone.
+// The values of all subscribed channels at one time, or the changes between two times. Only the library makes
+// them.
 class ChanmeterSamples {
  public:
   virtual ~ChanmeterSamples() = default;
@@ -83,38 +83,41 @@ class Chanmeter {
   using Channels = std::shared_ptr<const ChanmeterChannels>;
   using Subscription = std::shared_ptr<const ChanmeterSubscription>;
   using Samples = std::shared_ptr<const ChanmeterSamples>;
-  // 0 to go on; anything else ends the iteration.
+  // Returns 0 to continue; any other result ends the iteration.
   using Callback = std::function<int(const ChanmeterSample&)>;
 
   virtual ~Chanmeter() = default;
 
-  // The channels of that group and subgroup, each of them none for all. Null or, where no channel matches, an
-  // empty set. An error may come with a set: some channels then could not be read.
+  // Returns the channels of that group and subgroup; none stands for all. Returns null or an empty set where
+  // no channel matches. An error may come together with a set: some channels could then not be read.
   [[nodiscard]] virtual Channels copyChannelsInGroup(const std::optional<std::string>& group,
                                                      const std::optional<std::string>& subGroup,
                                                      std::optional<ChanmeterError>& error) = 0;
 
   virtual std::int32_t channelCount(const ChanmeterChannels& channels) = 0;
 
-  // `subscribed` gets the channels that can be sampled, which may be fewer. Null on failure.
+  // Sets `subscribed` to the channels that can be sampled, which may be fewer than `channels`. Returns null
+  // on failure.
   [[nodiscard]] virtual Subscription createSubscription(const Channels& channels, Channels& subscribed,
                                                         std::optional<ChanmeterError>& error) = 0;
 
-  // The current values. Null on failure.
+  // Returns the current values, or null on failure.
   [[nodiscard]] virtual Samples createSamples(const Subscription& subscription, const Channels& subscribed,
                                               std::optional<ChanmeterError>& error) = 0;
 
-  // What changed from `earlier` to `later`, channel by channel:
-  //   values, hits, transitions and residencies subtract; the latter three count from zero where they went
-  //   back, which means that the driver began anew; buckets match by bounds, states by name; duty cycles are
-  //   recomputed from the residencies, 0 when these sum to 0; minimum, maximum and unit are the later ones; a
-  //   channel that is in one of the two only gives nothing.
-  // Null with kErrorNothingEarlier when `earlier` is null.
+  // Returns what changed from `earlier` to `later`, channel by channel:
+  // - Values, hits, transitions and residencies are subtracted. Hits, transitions and residencies that went
+  //   back count from zero, because the driver restarted.
+  // - Buckets match by their bounds, states by their names.
+  // - Duty cycles are recomputed from the residencies; they are 0 when the residencies sum to 0.
+  // - Minimum, maximum and unit are those of `later`.
+  // - A channel that is in only one of the two gives nothing.
+  // Returns null with kErrorNothingEarlier when `earlier` is null.
   static constexpr std::int64_t kErrorNothingEarlier = 1;
   [[nodiscard]] virtual Samples createSamplesDelta(const Samples& earlier, const Samples& later,
                                                    std::optional<ChanmeterError>& error) = 0;
 
-  // Once for each channel, in the order of the samples.
+  // Calls `callback` once for each channel, in the order of the samples.
   virtual void iterate(const ChanmeterSamples& samples, const Callback& callback) = 0;
 };
 

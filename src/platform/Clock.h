@@ -5,21 +5,21 @@
 
 namespace tonewerk {
 
-// What time it is, and letting it pass. Any thread.
+// Tells the time, and waits. Any thread.
 class Clock {
  public:
   virtual ~Clock() = default;
 
-  // Wall-clock time: seconds since 1970-01-01 00:00 UTC. Can jump, in both directions.
+  // Returns the wall-clock time in seconds since 1970-01-01 00:00 UTC. It can jump, in both directions.
   virtual double now() const = 0;
 
-  // Time since some fixed point; never goes back.
+  // Returns the time since some fixed point. It never goes back.
   virtual std::chrono::nanoseconds monotonic() const = 0;
 
-  // What the device's time zone adds to UTC at the given wall-clock time.
+  // Returns the offset of the device's time zone from UTC at the given wall-clock time.
   virtual std::chrono::minutes utcOffset(double at) const = 0;
 
-  // Blocks the calling thread until so much monotonic time has passed; not at all for 0 or less.
+  // Blocks the calling thread until that much monotonic time has passed. Returns at once for 0 or less.
   virtual void sleep(std::chrono::nanoseconds duration) = 0;
 };
 

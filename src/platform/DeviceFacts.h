@@ -6,12 +6,12 @@
 
 namespace tonewerk {
 
-// Properties of the device, such as "InternalBuild"; they change at most by a reload. Any thread.
+// Gives properties of the device, such as "InternalBuild". Only a reload may change them. Any thread.
 class DeviceFacts {
  public:
   virtual ~DeviceFacts() = default;
 
-  // None when the property is missing or no boolean.
+  // Returns none when the property is missing or is not a boolean.
   virtual std::optional<bool> boolean(std::string_view property) const = 0;
 };
 

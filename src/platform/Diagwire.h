@@ -9,12 +9,13 @@ namespace PB {
 class Base;
 }
 
-// The wireless-diagnostics metric service. Any thread.
+// Records metrics for wireless diagnostics. Any thread.
 class Diagwire {
  public:
   virtual ~Diagwire() = default;
 
-  // Takes the record's protocol-buffer form before it returns. May wait while the recorder's queue is full.
+  // Encodes the record in its protocol-buffer form before it returns. May wait while the recorder's queue is
+  // full.
   virtual void post(std::uint32_t metricIdentifier, const PB::Base& record) = 0;
 };
 

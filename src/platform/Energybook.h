@@ -7,7 +7,7 @@
 
 namespace tonewerk {
 
-// The power log: records events that explain what used the battery. Any thread.
+// Records events in the power log; they explain what used the battery. Any thread.
 class Energybook {
  public:
   virtual ~Energybook() = default;

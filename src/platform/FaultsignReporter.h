@@ -17,7 +17,7 @@ inline constexpr const char* kFaultsignReplySessionID = "kFaultsignReplySessionI
 inline constexpr const char* kFaultsignReplyReason = "kFaultsignReplyReason";        // FaultsignError
 inline constexpr const char* kFaultsignKeyPayloadDEParameters = "kFaultsignKeyPayloadDEParameters";
 
-// Why the service refused, under kFaultsignReplyReason.
+// Why the service refused; the value of kFaultsignReplyReason.
 enum FaultsignError : std::int64_t {
   kFaultsignErrorNone = 0,
   kFaultsignErrorServiceNotReady,
@@ -31,7 +31,7 @@ enum FaultsignError : std::int64_t {
   kFaultsignErrorRequestThrottled,
 };
 
-// What a capture is about.
+// Describes the problem that a capture is about.
 struct FaultsignSignature {
   std::string domain;
   std::string type;
@@ -41,11 +41,13 @@ struct FaultsignSignature {
   std::optional<ValueMap> triggerThresholdValues;
 };
 
-// The diagnostic-capture service, as one symptom's reporter talks to it. On the thread that made it.
+// Asks the diagnostic-capture service for captures, for one kind of symptom. Use it on the thread that made
+// it.
 class FaultsignReporter {
  public:
-  // The reply map, none when the service had nothing to say. At most once, on any thread: perhaps one of the
-  // service's when the reporter is gone, perhaps the caller's before the call that it answers has returned.
+  // Takes the reply map, or none when the service sent none. Called at most once, on any thread: possibly on
+  // a thread of the service after the reporter is gone, or on the caller's thread before the call that it
+  // answers has returned.
   using Reply = std::function<void(const std::optional<ValueMap>&)>;
 
   virtual ~FaultsignReporter() = default;
@@ -55,29 +57,30 @@ class FaultsignReporter {
                                                  std::optional<std::string> detectedProcess,
                                                  std::optional<ValueMap> triggerThresholdValues) = 0;
 
-  // Captures now; `duration` in seconds. True when the parameters were accepted. The reply says whether a
-  // capture was made of it; for parameters that were not accepted it may say why not.
+  // Captures now. `duration` is in seconds. Returns true when the parameters were accepted; the reply then
+  // says whether a capture was made. For refused parameters the reply may give the reason.
   [[nodiscard]] virtual bool snapshotWithSignature(const FaultsignSignature& signature, double duration,
                                                    const std::optional<ValueMap>& event,
                                                    const std::optional<ValueMap>& payload, Reply reply) = 0;
 
-  // Captures when `duration` (seconds) has passed, unless the session is cancelled before. True as above.
+  // Captures after `duration` (in seconds), unless the session is cancelled before. The result and the reply
+  // are as above.
   [[nodiscard]] virtual bool startSessionWithSignature(const FaultsignSignature& signature, double duration,
                                                        const std::optional<ValueMap>& events,
                                                        const std::optional<ValueMap>& payload,
                                                        const std::optional<ValueMap>& actions,
                                                        Reply reply) = 0;
 
-  // An unknown identifier is logged and does nothing.
+  // Does nothing but log an unknown identifier.
   virtual void cancelSession(const std::string& identifier) = 0;
 };
 
-// Where reporters come from. Any thread.
+// Makes reporters. Any thread.
 class Capsa {
  public:
   virtual ~Capsa() = default;
 
-  // It may outlive this one; it then refuses everything.
+  // The reporter may outlive this object; it then refuses everything.
   [[nodiscard]] virtual std::unique_ptr<FaultsignReporter> makeReporter() = 0;
 };
 

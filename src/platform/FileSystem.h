@@ -8,48 +8,49 @@
 
 namespace tonewerk {
 
-// A file that is being written. It is to be seen under a name once it is whole: until place() it has none
-// that others know, and one that is destroyed before leaves nothing behind.
+// Writes a new file that gets its name only when it is complete. Until place() no other program can see the
+// file; destroying it before leaves nothing behind.
 class NewFile {
  public:
   virtual ~NewFile() = default;
 
-  // All of `text`, or an error. After one the file can be written to, but is never whole.
+  // Appends all of `text`, or fails. After a failure the file can still be written to, but cannot be placed
+  // any more.
   [[nodiscard]] virtual std::error_code write(std::string_view text) = 0;
 
-  // Ends the writing: the file stands under `name` in its directory, and name and text are on the disk.
-  // Once, but again after std::errc::file_exists (something stands there, which stays as it is). Other
-  // failures: the first one of a write(), a name that createFile() would refuse, what the operating system
-  // only finds out at the end; where that is that the name cannot be brought to the disk, the whole file
-  // stands there all the same.
+  // Ends the writing. The file then has `name` in its directory, and name and text are on the disk. Call
+  // once; call again only after std::errc::file_exists, which means that something has this name and stays
+  // unchanged. Other failures are the first failure of write(), a name that createFile() would refuse, and
+  // errors that the operating system reports only at the end. Where such an error is that the name could not
+  // be brought to the disk, the complete file is nevertheless there.
   [[nodiscard]] virtual std::error_code place(const std::string& name) = 0;
 };
 
-// Any thread.
+// Reads, makes and moves files and directories. Any thread.
 class FileSystem {
  public:
   virtual ~FileSystem() = default;
 
-  // The directory and what is missing above it. `mode` (as 0777) is what a directory made here gets, whatever
-  // the process's file mode mask. No error when it exists.
+  // Makes the directory and its missing parents. Each directory that it makes gets `mode` (such as 0777),
+  // whatever the process's file mode mask. Succeeds when the directory exists.
   [[nodiscard]] virtual std::error_code createDirectories(const std::string& path, unsigned mode) = 0;
 
-  // A new file that is to be `name` in `directory`. Fails when it would not lie directly in `directory` (a
-  // name with a slash or a zero byte, ".", ".."), when the name is too long, and with std::errc::file_exists
-  // when something stands there (a symbolic link, too).
+  // Begins a new file that place() can name `name` in `directory`. Fails when the file would not be directly
+  // in `directory` (a name with a slash or a zero byte, ".", ".."), when the name is too long, and with
+  // std::errc::file_exists when something has the name, even a symbolic link.
   [[nodiscard]] virtual std::unique_ptr<NewFile> createFile(const std::string& directory,
                                                             const std::string& name,
                                                             std::error_code& error) = 0;
 
-  // Whether something stands there; a symbolic link counts as what it leads to.
+  // Returns whether `path` exists. A symbolic link counts as its target.
   virtual bool exists(const std::string& path) const = 0;
 
-  // A regular file's whole text, of at most 16 MiB (else std::errc::file_too_large).
+  // Reads the whole text of a regular file of at most 16 MiB; a larger one is std::errc::file_too_large.
   [[nodiscard]] virtual std::error_code readFile(const std::string& path, std::string& text) const = 0;
 
-  // Moves a regular file to `name` in `directory`, also onto another file system, where it is copied. Fails,
-  // and leaves everything as it was, when something stands there (std::errc::file_exists) or when the file
-  // would not lie directly in `directory` (as createFile()).
+  // Moves a regular file to `name` in `directory`. On another file system it copies the file. Fails and
+  // changes nothing when something has the name (std::errc::file_exists) or when the file would not be
+  // directly in `directory` (see createFile()).
   [[nodiscard]] virtual std::error_code moveFile(const std::string& from, const std::string& directory,
                                                  const std::string& name) = 0;
 };

@@ -9,14 +9,14 @@
 
 namespace tonewerk {
 
-// A part of the product, as the bug tracker knows it.
+// A part of the product, as the bug tracker identifies it.
 struct TrackletComponent {
   std::string name;
   std::string version;
   std::int64_t identifier = 0;
 };
 
-// A bug report that waits for somebody to file it. The two numbers are the tracker's own enumerations.
+// A bug report that a person may file later. The two numbers are the bug tracker's own enumerations.
 struct TrackletDraft {
   std::string title;
   std::string problemDescription;
@@ -26,15 +26,15 @@ struct TrackletDraft {
   std::vector<std::string> diagnosticExtensionIDs;
 };
 
-// Offers drafts of bug reports. Any thread.
+// Makes drafts of bug reports. Any thread.
 class IssueDraftService {
  public:
-  // None when the draft was made, else what went wrong, in words.
+  // Takes none when the draft was made, else a text that says what went wrong.
   using CompletionHandler = std::function<void(const std::optional<std::string>& error)>;
 
   virtual ~IssueDraftService() = default;
 
-  // Returns at once; the handler runs once, later, on a thread of the service's.
+  // Returns at once. The handler runs later, once, on a thread of the service.
   virtual void createDraft(TrackletDraft draft, std::optional<std::string> processName,
                            std::string displayReason, CompletionHandler completionHandler) = 0;
 };

@@ -9,20 +9,21 @@
 
 namespace tonewerk {
 
-// JSON text out of values and back. Any thread.
+// Converts values to JSON text and back. Any thread.
 class JsonService {
  public:
   virtual ~JsonService() = default;
 
-  // Without white space, for the store: NaN and infinities become null. Dates become RFC 3339 texts.
+  // Returns JSON without white space, for the store. NaN and infinities become null, dates RFC 3339 texts.
   virtual std::string compact(const ValueMap& map) const = 0;
 
-  // Indented over several lines, for people. None when the map holds what JSON cannot say (NaN, an infinity);
-  // then `problem` names it.
+  // Returns JSON with indentation, for people. Returns none when the map holds a number that JSON cannot
+  // express (NaN, an infinity); `problem` then names it.
   [[nodiscard]] virtual std::optional<std::string> pretty(const ValueMap& map,
                                                           std::string& problem) const = 0;
 
-  // None when `text` is not one JSON value that values can express (null is not); then `problem` says where.
+  // Returns none when `text` is not one JSON value that Value can hold (null is not); `problem` then says
+  // where.
   [[nodiscard]] virtual std::optional<Value> parse(std::string_view text, std::string& problem) const = 0;
 };
 

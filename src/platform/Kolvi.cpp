@@ -18,7 +18,7 @@ const ValueArray* childrenOf(const ValueMap& dictionary) {
   return children == nullptr ? nullptr : children->asArray();
 }
 
-// Null for what is no probe.
+// Returns null when `element` is not a probe.
 const ValueMap* probeDictionary(const Value& element) {
   const ValueMap* dictionary = element.asMap();
   return dictionary != nullptr && dictionary->find(kName) != nullptr ? dictionary : nullptr;

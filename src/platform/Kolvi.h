@@ -13,61 +13,61 @@
 
 namespace tonewerk {
 
-// An interval of a signpost: from its begin to its end.
+// One interval of a signpost, from its begin to its end.
 struct KolviEvent {
   std::uint64_t timeDuration = 0;  // in the traced system's own unit of time
 };
 
-// What a probe list asks of a trace, with the answer. Probes form a tree.
+// One question of a probe list about a trace, with its answer. Probes form a tree.
 struct KolviProbe {
   std::string name;
   std::vector<KolviProbe> children;
   bool isIntervalProbe = false;
-  std::vector<KolviEvent> events;  // an interval probe's, in the order in which they ended
+  std::vector<KolviEvent> events;  // only of an interval probe; in the order in which they ended
 
   std::string description() const {
     return (isIntervalProbe ? "interval probe \"" : "probe \"") + name + "\"";
   }
 };
 
-// How a trace measures time.
+// Converts the times of a trace.
 class KolviTimeModel {
  public:
   virtual ~KolviTimeModel() = default;
   virtual double secondsFromSystemTimeDuration(std::uint64_t duration) const = 0;
 };
 
-// A trace that was read. One thread.
+// Gives access to a trace that was read. One thread.
 class KolviModel {
  public:
   virtual ~KolviModel() = default;
 
   virtual const KolviTimeModel& timeModel() const = 0;
 
-  // One probe a dictionary, in order; what is no dictionary, or one without a name, gives none. A dictionary
-  // holds "name", "type" ("interval" makes an interval probe), "signpost" (whose intervals; the name when it
-  // is absent) and "children", an array of dictionaries.
+  // Makes one probe for each dictionary, in order. It skips elements that are not dictionaries or have no
+  // name. A dictionary holds "name", "type" ("interval" makes an interval probe), "signpost" (whose intervals
+  // to take; by default the name) and "children", an array of dictionaries.
   virtual std::vector<KolviProbe> makeProbes(const ValueArray& dictionaries) const = 0;
 };
 
-// The trace-model library. Any thread.
+// Reads traces. Any thread.
 class Kolvi {
  public:
   virtual ~Kolvi() = default;
 
-  // Reads the trace. Null when that fails, a trace with lost events included; `problem` then says why.
+  // Reads the trace. Returns null on failure, also when the trace has lost events; `problem` then says why.
   [[nodiscard]] virtual std::unique_ptr<KolviModel> openModel(const std::string& traceLocation,
                                                               std::string& problem) = 0;
 };
 
-// The probe dictionaries that a probe list holds: an array's elements, or the one map that it is. None for
+// Returns the probe dictionaries of a probe list: the elements of an array, or a single map. Returns none for
 // any other root.
 [[nodiscard]] std::optional<ValueArray> probeDictionariesOf(const Value& root);
 
-// The signposts whose intervals the dictionaries and their children ask for.
+// Returns the signposts whose intervals the dictionaries and their children need.
 std::set<std::string> signpostsOf(const ValueArray& dictionaries);
 
-// What KolviModel::makeProbes() promises, over whatever knows a signpost's intervals.
+// Implements KolviModel::makeProbes(). `eventsOf` returns a signpost's intervals.
 std::vector<KolviProbe> makeKolviProbes(
     const ValueArray& dictionaries,
     const std::function<std::vector<KolviEvent>(const std::string& signpost)>& eventsOf);

@@ -12,7 +12,7 @@
 
 namespace tonewerk {
 
-// Keys of a service session's two maps. A key's text is the constant's name.
+// Keys of a session's two maps. The text of each key is the name of its constant.
 inline const SharedString kLinkReportSessionInfoClientType("kLinkReportSessionInfoClientType");
 inline const SharedString kLinkReportSessionInfoClientVersion("kLinkReportSessionInfoClientVersion");
 inline const SharedString kLinkReportSessionInfoSessionID("kLinkReportSessionInfoSessionID");
@@ -24,46 +24,46 @@ inline const SharedString kLinkReportSessionInfoClientBundleID("kLinkReportSessi
 inline const SharedString kLinkReportUserInfoClientName("kLinkReportUserInfoClientName");
 inline const SharedString kLinkReportUserInfoServiceName("kLinkReportUserInfoServiceName");
 
-// One session of the real-time-communication reporting service:
+// Reports one session to the real-time-communication reporting service:
 //
 //   initWithSessionInfo() -> startConfiguration...() -> [backends] -> sendMessage...()... -> flushMessages()
 //
-// One thread at a time. No call waits for a network. Destroying it ends the session; its handler may still be
-// called after that.
+// Use it on one thread at a time. No call waits for a network. Destroying it ends the session; its handler
+// may still be called after that.
 class LinkReportSession {
  public:
-  // The names of the backends that take this session's messages; none without any.
+  // The names of the backends that take this session's messages; none when there are no backends.
   using Backends = std::optional<std::vector<std::string>>;
   using CompletionHandler = std::function<void(Backends backends)>;
 
   virtual ~LinkReportSession() = default;
 
-  // Asks for the backends. `handler` is called once or never, at once or later, on any thread.
+  // Asks for the backends. `handler` is called at most once, before or after this returns, on any thread.
   virtual void startConfigurationWithCompletionHandler(CompletionHandler handler) = 0;
 
-  // Hands the message to every backend, which delivers it in its own time. False when one could not take it;
-  // then `problem` says why, or is empty. May wait for the report store as any recording does.
+  // Passes the message to every backend; each delivers it later. Returns false when a backend could not take
+  // it; `problem` then says why, or is empty. May wait while the report store's queue is full.
   [[nodiscard]] virtual bool sendMessageWithCategory(std::uint16_t category, std::uint16_t type,
                                                      const ValueMap& payload, std::string& problem) = 0;
 
-  // What was sent goes out now instead of in a batch. Does not wait for it.
+  // Sends the messages now instead of in a batch. Does not wait for it.
   virtual void flushMessages() = 0;
 
   // For the log.
   virtual std::string description() const = 0;
 };
 
-// The real-time-communication reporting service. One thread at a time; outlives its sessions.
+// The real-time-communication reporting service. Use it on one thread at a time. It outlives its sessions.
 class LinkReport {
  public:
   virtual ~LinkReport() = default;
 
-  // Places a session below another one in a tree of sessions, or at the root without a parent. None when the
-  // service gives none.
+  // Returns a token that places a session below another one in a tree of sessions, or at the root when there
+  // is no parent. Returns none when the service has no token.
   [[nodiscard]] virtual std::optional<std::string> newHierarchyTokenFromParentToken(
       const std::optional<std::string>& parentToken) = 0;
 
-  // Never null. `frameworksToCheck` null for none.
+  // Never returns null. `frameworksToCheck` may be null.
   [[nodiscard]] virtual std::unique_ptr<LinkReportSession> initWithSessionInfo(
       const ValueMap& sessionInfo, const ValueMap& userInfo, const ValueArray* frameworksToCheck) = 0;
 };

@@ -16,28 +16,28 @@
 
 namespace tonewerk {
 
-// In ascending order of weight.
+// Ordered from the least to the most important.
 enum class LogLevel { kDebug, kInfo, kDefault, kError };
 
-// "debug", "info", "default" or "error".
+// Returns "debug", "info", "default" or "error".
 std::string_view textOf(LogLevel level);
 
-// Where log lines go. Any thread; a line is written whole.
+// Writes log lines. Any thread; each line is written as a whole.
 class Log {
  public:
   virtual ~Log() = default;
 
-  // Whether a line of this category code (such as "twrr") and level would be written. Cheap: asked for every
-  // line before it is formatted.
+  // Returns whether a line of this category code (such as "twrr") and level would be written. It is cheap,
+  // because it runs for every line before the line is formatted.
   virtual bool isEnabled(std::string_view category, LogLevel level) const = 0;
 
-  // `message` as it is to be read, prefix included. `subsystem` as "com.orvane.tonewerk". Never fails: what
-  // cannot be written is lost.
+  // Writes `message`, which includes the prefix. `subsystem` is for example "com.orvane.tonewerk". It reports
+  // no failure: a line that cannot be written is lost.
   virtual void write(std::string_view subsystem, std::string_view category, LogLevel level,
                      std::string_view message) = 0;
 };
 
-// One area of the daemon in the log. Any thread.
+// Writes the log lines of one area of the daemon. Any thread.
 class LogCategory {
  public:
   // `log` outlives the category.
@@ -54,7 +54,7 @@ class LogCategory {
   std::string_view subsystem() const { return subsystem_; }
   std::string_view code() const { return code_; }
 
-  // For the platform's use; starts at zero.
+  // Free for the platform to use. It starts at zero.
   std::uint64_t word = 0;
 
  private:
@@ -63,16 +63,17 @@ class LogCategory {
   const std::string code_;
 };
 
-// Log lines in the daemon's own form, "%25s:%-5d " of source file and line and then a message:
+// The functions below write log lines in the daemon's own form: "%25s:%-5d " of source file and line, then a
+// message:
 //
 //   debugLog(TWReportingSessionCategory(), "stop called. reporterID=%lli", reporterID_);
 //
-// Below its category's threshold a line costs a comparison; its arguments are then not turned into text. A
-// conversion says how its argument is shown, the argument's own type says what it is: %@ shows anything, %i,
-// %d, %u, %li, %lli, %lu, %ld and %zu an integer, %f a number with six decimals, %s a text. A format with
-// another number of conversions than arguments does not compile.
+// Below its category's threshold a line costs one comparison; its arguments are not converted to text. A
+// conversion says how its argument is shown, and the argument's type says what it is: %@ shows anything, %i,
+// %d, %u, %li, %lli, %lu, %ld and %zu an integer, %f a number with six decimals, %s a text. A format whose
+// number of conversions differs from its number of arguments does not compile.
 
-// How an argument becomes text. Overload for more types, or give them a description().
+// Convert an argument to text. Add an overload for another type, or give the type a description().
 inline void appendLogText(std::string& out, const Value& value) { out += value.text(); }
 inline void appendLogText(std::string& out, const Value* value) { out += textOf(value); }
 inline void appendLogText(std::string& out, const ValueMap& map) { out += map.text(); }
@@ -94,7 +95,7 @@ void appendLogArgument(std::string& out, const T& argument, char conversion) {
   } else if constexpr (Describable<T>) {
     out += argument.description();
   } else if constexpr (std::is_invocable_v<const T&>) {
-    appendLogArgument(out, argument(), conversion);  // text that is only made when it is wanted
+    appendLogArgument(out, argument(), conversion);  // the text is only made when it is needed
   } else if constexpr (requires { appendLogText(out, argument); }) {
     appendLogText(out, argument);
   } else if constexpr (
@@ -115,7 +116,8 @@ void appendLogArgument(std::string& out, const T& argument, char conversion) {
   }
 }
 
-// Where a line was written. Made out of the category, so that the call's own file and line are taken.
+// Holds where a line was written. It is made from the category, so that the default arguments take the file
+// and line of the call.
 struct LogSite {
   LogSite(const LogCategory* logCategory, const char* logFile = __builtin_FILE(),
           int logLine = __builtin_LINE())
@@ -172,7 +174,7 @@ using Format = CheckedFormat<std::type_identity_t<Arguments>...>;
 
 }  // namespace log_detail
 
-// "%25s:%-5d " of the file's base name without its ending, and the line.
+// Returns "%25s:%-5d " of the file's base name without its ending, and the line.
 std::string logPrefix(std::string_view file, int line);
 
 template <typename... Arguments>

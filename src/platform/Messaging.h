@@ -10,35 +10,35 @@
 
 namespace tonewerk {
 
-// A client's connection, as the listener's delegate sets it up.
+// A client's connection, from the view of the listener's delegate.
 //
 //   accepted -> set up by the delegate -> resumed -> requests ... -> ended
 //                                                                    interruption handler
 //                                                                    invalidation handler
-//                                                                    exported object let go
+//                                                                    request handler released
 //
-// Everything here runs on the messaging thread. After a connection has ended, replies to it go nowhere.
+// Everything here runs on the messaging thread. Replies to a connection that has ended are dropped.
 class MessagingConnection {
  public:
   virtual ~MessagingConnection() = default;
 
-  // The peer's, as the kernel says it.
+  // Identify the peer, as the kernel reports it.
   virtual std::int32_t processIdentifier() const = 0;
-  virtual std::uint32_t userIdentifier() const = 0;  // kNoUser when it says none
+  virtual std::uint32_t userIdentifier() const = 0;  // kNoUser when the kernel reports none
 
   // For log lines.
   virtual std::string description() const = 0;
 
-  // Before resume(). `interface` must outlive the connection; `object` is held until the invalidation handler
-  // has returned.
-  virtual void exportObject(const RequestSet& interface, std::shared_ptr<RequestHandler> object) = 0;
+  // Sets who handles the requests. Call before resume(). `requests` must outlive the connection; `handler` is
+  // kept until the invalidation handler has returned.
+  virtual void exportObject(const RequestSet& requests, std::shared_ptr<RequestHandler> handler) = 0;
 
-  // Before resume(). Called when the connection has ended, in one direction or both, first the interruption
-  // handler, then the invalidation handler, once each.
+  // Set the handlers that run when the connection has ended, in one direction or both: first the interruption
+  // handler, then the invalidation handler, once each. Call before resume().
   virtual void setInterruptionHandler(std::function<void()> handler) = 0;
   virtual void setInvalidationHandler(std::function<void()> handler) = 0;
 
-  // From now on requests are read.
+  // Starts to read requests.
   virtual void resume() = 0;
 };
 
@@ -46,24 +46,25 @@ class MessagingListenerDelegate {
  public:
   virtual ~MessagingListenerDelegate() = default;
 
-  // On the messaging thread, for every new connection, before anything is read from it. False turns it away.
-  // The connection belongs to the listener and lives until its invalidation handler has returned.
+  // Runs on the messaging thread for every new connection, before anything is read from it. Returns false to
+  // refuse the connection. The connection belongs to the listener and lives until its invalidation handler
+  // has returned.
   [[nodiscard]] virtual bool listenerShouldAcceptNewConnection(MessagingConnection& connection) = 0;
 };
 
-// The named service that clients connect to.
+// The named service to which clients connect.
 class MessagingListener {
  public:
   virtual ~MessagingListener() = default;
 
-  // Before resume(); `delegate` outlives the listener.
+  // Call before resume(). `delegate` outlives the listener.
   virtual void setDelegate(MessagingListenerDelegate& delegate) = 0;
 
   // Starts to accept connections.
   virtual void resume() = 0;
 
-  // Accepts nothing more and ends every connection; their handlers have returned when this does. Not from the
-  // messaging thread.
+  // Stops to accept connections and ends every connection. All their handlers have returned when this
+  // returns. Do not call it on the messaging thread.
   virtual void shutDown() = 0;
 };
 

@@ -47,7 +47,8 @@ std::optional<std::string> NotificationHandlers::nameOf(Token token) const {
 }
 
 void NotificationHandlers::remove(Token token) {
-  std::shared_ptr<Registration> removed;  // ends after the lock: what the handler holds may use this object
+  std::shared_ptr<Registration>
+      removed;  // destroyed after the lock is released: its handler may own something that uses this object
   const MutexLock lock(mutex_);
   const auto found = registrations_.find(token);
   if (found == registrations_.end()) return;
@@ -68,11 +69,12 @@ void NotificationHandlers::tellAll() {
   for (const auto& [token, registration] : registrations_) queue(token, registration);
 }
 
-// Holds the lock, so that nothing reaches a queue after remove() has returned.
+// The lock is held, so that no handler reaches a queue after remove() has returned.
 void NotificationHandlers::queue(Token token, const std::shared_ptr<Registration>& registration) {
   if (registration->isQueued.exchange(true)) return;
   registration->queue.async([token, registration] {
-    // First, so that a post during the handler, which may have read already, queues it again.
+    // Cleared first: a post during the handler, which may already have read the state, queues the handler
+    // again.
     registration->isQueued = false;
     if (!registration->isCancelled) registration->handler(token);
   });

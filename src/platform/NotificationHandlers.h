@@ -13,34 +13,34 @@
 
 namespace tonewerk {
 
-// Who is registered with a notification service, for implementations of it: they know when a name was posted,
-// this tells its handlers.
+// Holds the registrations of a notification service, for its implementations: they learn that a name was
+// posted, and this runs the handlers of the name.
 //
-// A handler that is already queued is not queued again, so a name that is posted without end costs a queue
-// one piece of work at a time. Any thread.
+// A handler that is already queued is not queued again, so that a name that is posted all the time costs a
+// queue one piece of work at a time. Any thread.
 class NotificationHandlers {
  public:
   using Token = NotificationService::Token;
   using Handler = std::function<void(Token)>;
 
   static constexpr std::size_t kMaxNameBytes = 255;
-  // Whether it can name a notification, which is a file.
+  // Returns whether `name` is valid as the name of a notification, which is a file name.
   static bool isName(std::string_view name);
 
   NotificationHandlers() = default;
   NotificationHandlers(const NotificationHandlers&) = delete;
   NotificationHandlers& operator=(const NotificationHandlers&) = delete;
-  // What is still queued then does nothing.
+  // Handlers that are still queued then do nothing.
   ~NotificationHandlers();
 
-  // `queue` outlives the registration, or this.
+  // `queue` outlives the registration or this object.
   [[nodiscard]] Token add(std::string_view name, SerialQueue& queue, Handler handler);
-  // None for a token that is not registered.
+  // Returns none for a token that is not registered.
   [[nodiscard]] std::optional<std::string> nameOf(Token token) const;
   // See NotificationService::cancel().
   void remove(Token token);
 
-  // Queues the handlers of a name, in the order in which they were added.
+  // Queues the handlers of a name, or of all names, in the order in which they were added.
   void tell(std::string_view name);
   void tellAll();
 

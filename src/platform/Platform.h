@@ -32,7 +32,7 @@ class TimerService;
 class TracePoints;
 class WhirlcapRequest;
 
-// The operating system's services, as the core sees them. Everything referred to outlives the core.
+// The operating system's services, as the core uses them. All of them outlive the core.
 struct Platform {
   Log& log;
   TracePoints& tracePoints;
@@ -60,9 +60,9 @@ struct Platform {
   Chanmeter& chanmeter;
   CommandRunner& commands;
   DetachedThreads& threads;
-  // Where reports for people go; absolute.
+  // The directory for reports that people read; absolute.
   std::string logsDirectory = {};
-  // Where files go that are soon moved; absolute.
+  // The directory for files that are soon moved elsewhere; absolute.
   std::string temporaryDirectory = {};
 };
 

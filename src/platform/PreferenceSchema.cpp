@@ -76,11 +76,11 @@ bool isNumber(const Value& value) {
 }
 
 bool isWithin(const Preference& preference, double number) {
-  return !std::isnan(number) && (!preference.least || number >= *preference.least) &&
-         (!preference.most || number <= *preference.most);
+  return !std::isnan(number) && (!preference.minimum || number >= *preference.minimum) &&
+         (!preference.maximum || number <= *preference.maximum);
 }
 
-// Whether it is an array of as many entries as there must be, all of which `suit`.
+// Returns whether `value` is an array with the required number of entries, for all of which `suits` is true.
 template <typename Suits>
 bool isArray(const Preference& preference, const Value& value, Suits suits) {
   const ValueArray* array = value.asArray();
@@ -111,17 +111,17 @@ bool suits(const Preference& preference, const Value& value) {
   return false;
 }
 
-// Whole numbers without a point.
+// Writes the number without a point: all limits are whole numbers.
 std::string numberText(double number) { return std::to_string(static_cast<std::int64_t>(number)); }
 
 std::string rangeText(const Preference& preference) {
   std::string text;
-  if (preference.least) text += " from " + numberText(*preference.least);
-  if (preference.most) text += " to " + numberText(*preference.most);
+  if (preference.minimum) text += " from " + numberText(*preference.minimum);
+  if (preference.maximum) text += " to " + numberText(*preference.maximum);
   return text;
 }
 
-// As it would be written.
+// Returns the value as a person would write it in a preference file.
 std::string textInQuotes(const Value& value) {
   if (const bool* boolean = value.asBoolean()) return *boolean ? "true" : "false";
   return value.asString() == nullptr ? value.text() : '"' + value.text() + '"';

@@ -8,22 +8,23 @@
 
 namespace tonewerk {
 
-// What the operating system knows of processes. Any thread.
+// Gives what the operating system knows of processes. Any thread.
 class ProcessInformation {
  public:
   virtual ~ProcessInformation() = default;
 
-  // The process's short name (at most 15 bytes); none when there is no such process.
+  // Returns the process's short name (at most 15 bytes); none when there is no such process.
   virtual std::optional<std::string> processName(std::int32_t processIdentifier) const = 0;
 
-  // This process.
+  // Returns the identifier of this process.
   virtual std::int32_t ownProcessIdentifier() const = 0;
 
-  // Memory that this process keeps from others, in bytes: resident and swapped anonymous memory. On failure
-  // the operating system's text of why.
+  // Returns the memory that only this process uses, in bytes: resident and swapped anonymous memory. On
+  // failure returns the operating system's error text.
   [[nodiscard]] virtual std::variant<std::uint64_t, std::string> physicalFootprint() const = 0;
 
-  // Processor time of this process so far, in microseconds (the ticks of the C library's processor clock).
+  // Returns the processor time of this process so far, in microseconds (the ticks of the C library's
+  // processor clock).
   virtual std::int64_t processorTimeMicroseconds() const = 0;
 };
 

@@ -11,17 +11,17 @@
 
 namespace tonewerk {
 
-// Takes answers. Any thread.
+// Sends answers to a peer. Any thread.
 class ReplySink {
  public:
   virtual ~ReplySink() = default;
-  // `result` none is nil. With an error there is no result.
+  // A `result` of none is nil. With an error there is no result.
   virtual void reply(std::uint32_t requestIdentifier, const std::optional<ReplyError>& error,
                      const std::optional<Value>& result) = 0;
 };
 
-// The way back to whoever sent a request. Copyable; may be called never, once or several times, on any
-// thread, also when the peer is gone. An empty one swallows its answer: a notification's.
+// Answers a request. It can be copied, and called never, once or several times, on any thread, also when the
+// peer is gone. An empty Reply, which belongs to a notification, drops the answer.
 class Reply {
  public:
   Reply() = default;
@@ -38,24 +38,24 @@ class Reply {
   std::uint32_t requestIdentifier_ = 0;
 };
 
-// Counts the requests of one connection that are not finished. Any thread.
+// Counts the requests of one connection that have not finished. Any thread.
 class InFlightCounter {
  public:
   virtual ~InFlightCounter() = default;
   virtual void finished(std::size_t bytes) = 0;
 };
 
-// Says, by its destruction, that a request's body has run. Whoever carries the body to a queue carries this
-// with it.
+// Reports by its destruction that a request's body has run. Code that passes the body to a queue passes the
+// token with it.
 class InFlightToken {
  public:
   InFlightToken() = default;
-  InFlightToken(std::shared_ptr<InFlightCounter> gauge, std::size_t bytes)
-      : gauge_(std::move(gauge)), bytes_(bytes) {}
+  InFlightToken(std::shared_ptr<InFlightCounter> counter, std::size_t bytes)
+      : counter_(std::move(counter)), bytes_(bytes) {}
   InFlightToken(InFlightToken&&) noexcept = default;
   InFlightToken& operator=(InFlightToken&& other) noexcept {
     finish();
-    gauge_ = std::move(other.gauge_);
+    counter_ = std::move(other.counter_);
     bytes_ = other.bytes_;
     return *this;
   }
@@ -63,20 +63,21 @@ class InFlightToken {
 
  private:
   void finish() {
-    if (gauge_ != nullptr) gauge_->finished(bytes_);
-    gauge_ = nullptr;
+    if (counter_ != nullptr) counter_->finished(bytes_);
+    counter_ = nullptr;
   }
 
-  std::shared_ptr<InFlightCounter> gauge_;
+  std::shared_ptr<InFlightCounter> counter_;
   std::size_t bytes_ = 0;
 };
 
-// What a connection's requests are made to.
+// Handles the requests of a connection.
 class RequestHandler {
  public:
   virtual ~RequestHandler() = default;
 
-  // On the messaging thread, in the order of arrival; must not block. `arguments` suit the method.
+  // Runs on the messaging thread, in the order of arrival. It must not block. `method` is the index in the
+  // request set; `arguments` fit the method.
   virtual void handleRequest(std::size_t method, Arguments arguments, Reply reply, InFlightToken token) = 0;
 };
 

@@ -10,22 +10,22 @@ namespace tonewerk {
 // What went wrong, in words; none when nothing did.
 using RuntraceError = std::optional<std::string>;
 
-// Keeps a finished trace's files: they go with its last copy.
+// Keeps the files of a finished trace: they are removed with the last copy of the token.
 using RuntraceToken = std::shared_ptr<void>;
 
-// Hears of a trace session's course, on threads of the service's or from inside the call that asks.
+// Learns of the progress of a trace session, on threads of the service or inside the call that causes it.
 //
 //   startRuntrace() -> runtraceDidStart() -> stopRuntrace() -> runtraceDidStop() -> runtraceDidComplete()
 //
-// An error ends the course; which call brings it depends on where the service noticed. A trace that breaks
-// while it runs completes with an error, unasked.
+// An error ends the session; which function reports it depends on where the service noticed it. A trace that
+// fails while it runs completes with an error without being stopped.
 class RuntraceSessionDelegate {
  public:
   virtual ~RuntraceSessionDelegate() = default;
 
   virtual void runtraceDidStart(const RuntraceError& error) = 0;
   virtual void runtraceDidStop(const RuntraceError& error) = 0;
-  // `traceLocation` is an absolute path, empty with an error; `token` is then null.
+  // `traceLocation` is an absolute path. With an error it is empty and `token` is null.
   virtual void runtraceDidComplete(const std::string& traceLocation, const RuntraceToken& token,
                                    const RuntraceError& error) = 0;
 };
@@ -33,37 +33,37 @@ class RuntraceSessionDelegate {
 // What to trace: the signposts that a probe list names.
 struct RuntraceConfiguration {
   std::string probeListPath;
-  // Packs the finished trace; a service that cannot leaves it as it is.
+  // Compresses the finished trace. A service that cannot compress leaves it unchanged.
   bool compressesFinishedTrace = true;
 };
 
-// One trace, from its start to its completion. Any thread; no call waits for the service.
+// Controls one trace, from its start to its completion. Any thread; no call waits for the service.
 //
-// Destroying it, which a callback may do, gives up a trace that has not completed.
+// Destroying it, which a callback may do, abandons a trace that has not completed.
 class RuntraceSession {
  public:
   virtual ~RuntraceSession() = default;
 
-  // Not kept alive. When this has returned the delegate before is not called any more, and no call of it
-  // still runs, unless this was called from inside one.
+  // Does not keep the delegate alive. After it returns no call of the previous delegate begins or still runs;
+  // called from inside such a call, it does not wait for that call.
   virtual void setDelegate(std::weak_ptr<RuntraceSessionDelegate> delegate) = 0;
 
-  // Once.
+  // Call once.
   virtual void startRuntrace() = 0;
   // Does nothing for a session that was not started or has ended.
   virtual void stopRuntrace() = 0;
 
-  // Until it has failed or completed.
+  // Returns true until the session has failed or completed.
   virtual bool isValid() const = 0;
 };
 
-// The performance-trace service: it records when signposts of the device's programs begin and end. Any
-// thread.
+// The performance-trace service records when signposts of the device's programs begin and end. Any thread.
 class Runtrace {
  public:
   virtual ~Runtrace() = default;
 
-  // Never null; what is wrong with the configuration or the service, the start's callback says.
+  // Never returns null. A problem with the configuration or the service is reported by the callback of the
+  // start.
   [[nodiscard]] virtual std::shared_ptr<RuntraceSession> makeSession(
       const RuntraceConfiguration& configuration) = 0;
 };

@@ -6,15 +6,16 @@
 
 namespace tonewerk {
 
-// A counting semaphore, for the few who wait by design. Any thread.
+// A counting semaphore, for code that blocks by design. Any thread.
 class Semaphore {
  public:
   virtual ~Semaphore() = default;
 
-  // Lets one wait() go on: one that waits, or the next one.
+  // Releases one wait(): a current one, or the next one.
   virtual void signal() = 0;
 
-  // Takes one signal, and blocks the calling thread until there is one; false when `timeout` passed without.
+  // Takes one signal and blocks the calling thread until there is one. Returns false when there was none
+  // within `timeout`.
   [[nodiscard]] virtual bool wait(std::chrono::nanoseconds timeout) = 0;
 };
 
@@ -22,7 +23,7 @@ class SemaphoreFactory {
  public:
   virtual ~SemaphoreFactory() = default;
 
-  // Without a signal.
+  // Makes a semaphore without a signal.
   [[nodiscard]] virtual std::unique_ptr<Semaphore> makeSemaphore() = 0;
 };
 

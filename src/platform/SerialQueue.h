@@ -10,31 +10,31 @@ namespace tonewerk {
 
 // Runs pieces of work one after the other, in the order in which they were queued, on one thread at a time.
 //
-// async() and isCurrent() may be called from any thread, async() also from inside a piece of work. Destroying
-// the queue runs what is still queued and then returns; work queued during that is run as well. A queue must
-// not be destroyed from its own work.
+// Any thread may call async() and isCurrent(); a piece of work may call async(), too. Destroying the queue
+// runs what is still queued and then returns; work queued during that is run as well. A queue must not be
+// destroyed from its own work.
 class SerialQueue {
  public:
   virtual ~SerialQueue() = default;
 
-  // Never blocks. The work is destroyed on the queue, right after it ran.
+  // Never blocks. The work is destroyed on the queue, right after it has run.
   virtual void async(Task work) = 0;
 
-  // Returns when everything queued before the call has run. Not from the queue's own work.
+  // Returns when everything queued before the call has run. Do not call it from the queue's own work.
   virtual void drain() = 0;
 
-  // True on the thread that is running this queue's work.
+  // Returns true on the thread that is running this queue's work.
   virtual bool isCurrent() const = 0;
 
-  // True where objects that live on this queue may be used. That is the queue's own work; a queue without a thread
-  // of its own, as in tests, also admits the thread that made it. For assertions.
+  // Returns true where objects that live on this queue may be used: in the queue's own work. A queue without
+  // a thread of its own, as in tests, also returns true on the thread that made it. For assertions.
   virtual bool ownsThisThread() const { return isCurrent(); }
 
   virtual const std::string& name() const = 0;
 };
 
 enum class QueuePriority {
-  kUtility,          // behind everything a user waits for
+  kUtility,          // after everything for which a user waits
   kUserInteractive,  // the highest class of ordinary threads
 };
 

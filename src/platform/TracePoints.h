@@ -5,16 +5,16 @@
 
 namespace tonewerk {
 
-// Points in the daemon's run that a tracer can listen to. Any thread; costs next to nothing when nobody
-// listens.
+// Marks points in the daemon's run to which a tracer can listen. Any thread. Costs next to nothing while
+// nobody listens.
 class TracePoints {
  public:
   virtual ~TracePoints() = default;
 
   virtual void emit(std::uint32_t code) = 0;
 
-  // Something takes from here to its end, on this thread; for performance traces. `identifier` tells those of
-  // one name apart.
+  // Mark an interval for performance traces. It begins and ends on the same thread. `identifier`
+  // distinguishes intervals with the same name.
   virtual void beginInterval(const char* name, std::int64_t identifier) = 0;
   virtual void endInterval(const char* name, std::int64_t identifier) = 0;
 };

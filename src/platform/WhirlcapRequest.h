@@ -7,7 +7,7 @@
 
 namespace tonewerk {
 
-// Requests a stall trace: a look at the whole system at the moment when something came to a halt. Any thread.
+// Requests stall traces: a record of the whole system at the moment when something stalled. Any thread.
 class WhirlcapRequest {
  public:
   struct Flags {
@@ -17,7 +17,7 @@ class WhirlcapRequest {
 
   virtual ~WhirlcapRequest() = default;
 
-  // Returns at once; what cannot be done is in the service's own log lines.
+  // Returns at once. The service logs what it cannot do.
   virtual void request(std::string requester, std::string reason, std::string description, ValueMap payload,
                        Flags flags) = 0;
 };

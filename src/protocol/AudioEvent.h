@@ -5,8 +5,8 @@
 
 namespace tonewerk {
 
-// What part of the audio stack a message is about: a base category of 1 to 16 in the low half, a bit pattern
-// for the event domain that produced it, or nothing, in the high half.
+// Says which part of the audio stack a message is about. The low half is a base category from 1 to 16. The
+// high half is a bit pattern for the event domain that produced the message, or 0.
 using AudioEventCategory = std::uint32_t;
 
 inline constexpr AudioEventCategory kCategoryGeneric = 1;
@@ -20,7 +20,7 @@ inline constexpr AudioEventCategory kCategoryGather = 15;
 inline constexpr AudioEventCategory kCategoryUnknown = 0xFFFFFFFF;
 inline constexpr AudioEventCategory kDomainSession = 0x08000000;
 
-// What happened: 0 to 19, or unknown.
+// Says what happened: 0 to 19, or unknown.
 using AudioEventType = std::uint16_t;
 
 inline constexpr AudioEventType kTypeGeneric = 0;
@@ -37,7 +37,7 @@ inline constexpr AudioEventType kTypeState = 18;
 inline constexpr AudioEventType kTypeMemoryLog = 19;
 inline constexpr AudioEventType kTypeUnknown = 65535;
 
-// What a session reports for: 0 to 13, or unknown.
+// Says for which service a session reports: 0 to 13, or unknown.
 using AudioServiceType = std::uint16_t;
 
 inline constexpr AudioServiceType kServiceGeneric = 0;
@@ -47,7 +47,8 @@ inline constexpr AudioServiceType kServiceTest = 11;
 inline constexpr AudioServiceType kServiceApiUsage = 12;
 inline constexpr AudioServiceType kServiceUnknown = 65535;
 
-// A session's identifier, chosen by its client. 0 is no session, 1 the daemon's own single-message session.
+// Identifies a session; its client chooses it. 0 stands for no session, 1 for the daemon's own single-message
+// session.
 using ReporterID = std::int64_t;
 
 }  // namespace tonewerk

@@ -8,17 +8,17 @@
 
 namespace tonewerk {
 
-// The texts of categories, types and services. Free functions, any thread.
+// Convert categories, types and services to texts. Any thread.
 
-// "Playback"; with an event domain "HAL_Playback". A domain without a text leaves its "_" standing, a base
-// without one reads "Undefined".
+// Returns for example "Playback"; with an event domain "HAL_Playback". The "_" stays when the domain has no
+// text. An unknown base category is "Undefined".
 std::string TWReportingUtilityCategoryString(AudioEventCategory category);
 std::string TWReportingUtilityTypeString(AudioEventType type);
 
 std::string TWReportingUtilityGenerateServiceNameFromServiceType(AudioServiceType type);
 AudioServiceType TWReportingUtilityGenerateServiceTypeFromServiceName(std::string_view name);
 
-// Whether the category carries an event domain.
+// Returns whether the category has an event domain.
 bool TWReportingUtilityIsABTestModeOn(AudioEventCategory category);
 
 }  // namespace tonewerk

@@ -19,7 +19,7 @@ ValueMap featureTable() {
 }
 
 std::optional<std::string> notificationOfPreference(std::string_view domain, std::string_view key) {
-  // One notification announces all of the daemon's own.
+  // One notification announces all of the daemon's own preferences.
   if (domain == kReportingSuite) return std::string(TWReportingNotificationName);
   const ValueMap features = featureTable();
   const Value* feature = features.find(key);

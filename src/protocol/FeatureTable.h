@@ -9,23 +9,24 @@
 
 namespace tonewerk {
 
-// The name under which the daemon's own preferences are announced as changed.
+// The notification that announces changes of the daemon's own preferences.
 inline constexpr std::string_view TWReportingNotificationName = "com.orvane.tonewerk.reporting";
 
 // The domain of the daemon's own preferences.
 inline constexpr std::string_view kReportingSuite = "com.orvane.tonewerk";
 
 // The keys of a feature's descriptor.
-inline constexpr std::string_view kFeatureDefaultsDomain = "defaults_domain";  // where its preference is
+inline constexpr std::string_view kFeatureDefaultsDomain = "defaults_domain";  // the domain of its preference
 inline constexpr std::string_view kFeatureDomain = "feature_domain";           // its name
-inline constexpr std::string_view kFeatureNotification = "notification";       // announces its changes
-inline constexpr std::string_view kFeatureNotifyToken = "notify_token";        // of its registration
+inline constexpr std::string_view kFeatureNotification =
+    "notification";  // the notification that announces its changes
+inline constexpr std::string_view kFeatureNotifyToken = "notify_token";  // the token of its registration
 
-// The features that the system monitor follows: a descriptor each, by its name.
+// Returns the features that the system monitor follows: each name with its descriptor.
 ValueMap featureTable();
 
-// The notification that announces a change of this preference to the system monitor; none for one that it
-// does not follow.
+// Returns the notification that announces a change of this preference to the system monitor; none when the
+// monitor does not follow the preference.
 [[nodiscard]] std::optional<std::string> notificationOfPreference(std::string_view domain,
                                                                   std::string_view key);
 

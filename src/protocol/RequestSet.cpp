@@ -7,19 +7,19 @@ namespace tonewerk {
 namespace {
 
 constexpr std::uint32_t kRoot = 0;
-constexpr std::uint64_t kInt64Most = static_cast<std::uint64_t>(std::numeric_limits<std::int64_t>::max());
+constexpr std::uint64_t kMaxInt64 = static_cast<std::uint64_t>(std::numeric_limits<std::int64_t>::max());
 
-// An integer of either form that lies in [least, most].
-bool isIntegerWithin(const Value& value, std::int64_t least, std::uint64_t most) {
+// Returns whether `value` is an integer, signed or unsigned, in [minimum, maximum].
+bool isIntegerWithin(const Value& value, std::int64_t minimum, std::uint64_t maximum) {
   if (const std::int64_t* integer = value.asInteger()) {
-    return *integer >= least && (*integer < 0 || static_cast<std::uint64_t>(*integer) <= most);
+    return *integer >= minimum && (*integer < 0 || static_cast<std::uint64_t>(*integer) <= maximum);
   }
   const std::uint64_t* number = value.asUnsigned();
-  return number != nullptr && *number <= most;
+  return number != nullptr && *number <= maximum;
 }
 
 bool isInt64(const Value& value) {
-  return isIntegerWithin(value, std::numeric_limits<std::int64_t>::min(), kInt64Most);
+  return isIntegerWithin(value, std::numeric_limits<std::int64_t>::min(), kMaxInt64);
 }
 
 bool isInt64List(const Value& value) {
@@ -48,7 +48,7 @@ bool suits(ParameterType type, const Argument& argument) {
   return false;
 }
 
-std::string_view wordsFor(ParameterType type) {
+std::string_view descriptionOf(ParameterType type) {
   switch (type) {
     case ParameterType::kInt64:
       return "a signed 64-bit integer";
@@ -83,7 +83,7 @@ std::optional<std::string> problemWith(const Method& method, const Arguments& ar
     const Parameter& parameter = method.parameters[at];
     if (suits(parameter.type, arguments[at])) continue;
     return std::string(method.name) + ": argument " + std::to_string(at + 1) + " (" +
-           std::string(parameter.name) + ") must be " + std::string(wordsFor(parameter.type));
+           std::string(parameter.name) + ") must be " + std::string(descriptionOf(parameter.type));
   }
   return std::nullopt;
 }

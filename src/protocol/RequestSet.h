@@ -21,7 +21,7 @@ struct Parameter {
   ParameterType type = ParameterType::kInt64;
 };
 
-// The parameters of one request, in order. A request has no more than kMaxParameters.
+// Lists the parameters of one request in order, at most kMaxParameters.
 class ParameterList {
  public:
   static constexpr std::size_t kMaxParameters = 4;
@@ -42,51 +42,51 @@ class ParameterList {
   std::size_t size_ = 0;
 };
 
-// kAny is for handlers that answer with whatever they like, kNever for requests that are not answered.
+// kAny: the handler may answer with any value. kNever: the request is never answered.
 enum class ResultType { kNone, kBoolean, kUInt16, kMap, kInt64List, kAny, kNever };
 
-// What a request is answered with. Not every transport needs to know, and none checks it.
+// Describes the answer to a request. Some transports need no description; none checks an answer against it.
 struct Result {
   ResultType type = ResultType::kNone;
   std::string_view name;
 };
 
-// One request that a handler understands.
+// Describes one request that a handler understands.
 struct Method {
   std::string_view name;
   ParameterList parameters = {};
   Result result = {};
-  // What an answer may come to. It counts against the connection's bound from the request on, since an answer
-  // is only measured when it is too late to refuse it.
+  // The most bytes that an answer may have. They count against the connection's limit as soon as the request
+  // arrives, because a finished answer can no longer be refused.
   std::size_t replyBytes = 0;
-  // Only for the user the daemon runs as, and root: what shows more of other clients than their identifiers.
-  // Front ends that do not know their peers' users leave such methods out.
+  // Only the user that the daemon runs as, and root, may call it: the answer shows more of other clients than
+  // their identifiers. Front ends that do not know their peers' users leave these methods out.
   bool forOwner = false;
-  // Whether it changes sessions or the daemon, rather than asks about them. A connection that only observes
-  // may not make such a request.
+  // Whether the method changes sessions or the daemon instead of only reading. A connection that only
+  // observes may not call it.
   bool changesState = false;
 };
 
-// The requests that a handler understands. A request names its method by the place in `methods`.
+// Lists the requests that a handler understands. A request names its method by the index in `methods`.
 struct RequestSet {
   std::vector<Method> methods;
 
   [[nodiscard]] std::optional<std::size_t> find(std::string_view name) const;
 };
 
-// What a request brought for one parameter; none when it brought nothing where that is allowed.
+// The argument for one parameter; none for nil, where the parameter allows it.
 using Argument = std::optional<Value>;
 using Arguments = std::vector<Argument>;
 
-// What is wrong with `arguments` for `method` in words that name the argument, or none. A handler gets only
-// requests with which nothing is wrong.
+// Returns what is wrong with `arguments` for `method`, in words that name the argument; none when nothing is
+// wrong. Only requests without a problem reach a handler.
 [[nodiscard]] std::optional<std::string> problemWith(const Method& method, const Arguments& arguments);
 
-// An error answer.
+// An answer that reports an error.
 struct ReplyError {
   std::string domain;
   std::int64_t code = 0;
-  std::string message;  // empty when domain and code say it all
+  std::string message;  // empty when domain and code are enough
 
   friend bool operator==(const ReplyError&, const ReplyError&) = default;
 };
@@ -100,10 +100,10 @@ inline constexpr std::int64_t kNotPermitted = 4;
 
 ReplyError messagingError(std::int64_t code, std::string message);
 
-// A user that nobody is: that of a peer of whom the kernel says nothing.
+// No user has this identifier. It stands for the user of a peer about which the kernel says nothing.
 inline constexpr std::uint32_t kNoUser = 0xFFFF'FFFF;
 
-// Why a peer of that user may not call `method` in a daemon that runs as `owner`, or none.
+// Returns why a peer of `user` may not call `method` in a daemon that runs as `owner`; none when it may.
 [[nodiscard]] std::optional<ReplyError> problemWithCaller(const Method& method, std::uint32_t user,
                                                           std::uint32_t owner);
 

@@ -9,16 +9,16 @@
 
 namespace tonewerk {
 
-// Keys of the validity answer.
+// Keys of the answer to reporterIDValid.
 inline constexpr std::string_view TWReporterProxyKeyReporterID = "reporterID";
 inline constexpr std::string_view TWReporterProxyKeyServiceType = "serviceType";
 
-// Every request that the daemon understands, described once: clients name requests by these, front ends check
+// Describes every request that the daemon understands. Clients name requests by these, front ends check
 // arguments against them, and the service has a handler for each.
 namespace requests {
 
-// The most bytes that the answers of variable size may have. A list of reporter identifiers: about ten
-// clients with as many sessions as they may have.
+// The most bytes that an answer of variable size may have. kMaxReportersBytes holds the reporter identifiers
+// of about ten clients with as many sessions as they may have.
 inline constexpr std::size_t kMaxReportersBytes = std::size_t{512} << 10;
 inline constexpr std::size_t kMaxSessionListingBytes = std::size_t{512} << 10;
 inline constexpr std::size_t kMaxMessagesBytes = std::size_t{512} << 10;
@@ -64,7 +64,7 @@ inline constexpr Method kKillService{
     .name = "killService", .result = {ResultType::kNever, ""}, .changesState = true};
 inline constexpr Method kObserve{.name = "observe", .result = kSuccess};
 
-// What the daemon does now, for its own user and root.
+// Requests that watch what the daemon does, for its own user and root.
 inline constexpr Method kWatchSessions{.name = "watch.sessions",
                                        .parameters = {{"first", ParameterType::kInt64}},
                                        .result = {ResultType::kAny, "sessions"},
@@ -81,7 +81,7 @@ inline constexpr Method kWatchNextMessages{.name = "watch.nextMessages",
                                            .replyBytes = kMaxMessagesBytes,
                                            .forOwner = true};
 
-// All of them, in the order in which they are listed to people.
+// All requests, in the order in which they are listed to people.
 inline constexpr std::array kAll{kCreateReportingSession,
                                  kSetServiceType,
                                  kGetServiceNameForReporterID,

@@ -5,7 +5,7 @@
 
 namespace tonewerk {
 
-// Keys of the answers to who watches the daemon.
+// Keys of the answers to the watch requests.
 inline const SharedString kWatchKeyMissed("missed");
 inline const SharedString kWatchKeyMessages("messages");
 inline const SharedString kWatchKeyReporterID("reporterID");

@@ -60,19 +60,20 @@ void appendEscaped(std::string& out, unsigned char c) {
 
 bool isPlain(char c) { return static_cast<unsigned char>(c) >= 0x20 && c != '"' && c != '\\'; }
 
-// The same for eight characters at once; false, too, when one of them is not ASCII.
+// Checks eight characters at once. Also false when one of them is not ASCII.
 bool arePlain(const char* eight) {
   constexpr std::uint64_t kOnes = 0x0101010101010101U;
   constexpr std::uint64_t kHighs = kOnes * 0x80;
   std::uint64_t word = 0;
   std::memcpy(&word, eight, sizeof(word));
-  // The high bit of each byte that is zero, or above one that is.
+  // Sets the high bit of each byte that is zero; it may also set it in bytes above such a byte.
   const auto zeroes = [](std::uint64_t bytes) { return (bytes - kOnes) & ~bytes; };
   const std::uint64_t controls = word - kOnes * 0x20;
   return ((word | controls | zeroes(word ^ kOnes * '"') | zeroes(word ^ kOnes * '\\')) & kHighs) == 0;
 }
 
-// Where, from `at` on, the next character is that must be escaped; the text's size for none.
+// Returns the position of the next character, from `at` on, that must be escaped; the text's size when there
+// is none.
 std::size_t endOfPlain(std::string_view text, std::size_t at) {
   while (at + 8 <= text.size() && arePlain(text.data() + at)) at += 8;
   while (at < text.size() && isPlain(text[at])) ++at;

@@ -6,23 +6,24 @@
 
 namespace tonewerk {
 
-// Others choose texts that lines, files and terminals show. No byte of them may end a line or steer a
-// terminal.
+// Replaces control characters in texts that other programs choose and that are shown in lines, files and
+// terminals. No byte of such a text may end a line or control a terminal.
 //
-// Rules that differ, and why: what goes into JSON, TOML or Markdown is escaped there, and stays whole; the
-// tool's printable() takes the control characters of two bytes too, because it alone writes to a terminal.
+// Two places have other rules. Text that goes into JSON, TOML or Markdown is escaped there and loses nothing.
+// The tool's printable() also replaces the control characters of two bytes, because only the tool writes to a
+// terminal.
 
-// One of ASCII: below a space, or DEL.
+// True for an ASCII control character: below a space, or DEL.
 inline bool isControlCharacter(char byte) { return static_cast<unsigned char>(byte) < ' ' || byte == '\x7F'; }
 
-// `text` with `instead` for each of them.
+// Returns `text` with `instead` in place of each control character.
 inline std::string withoutControlCharacters(std::string text, char instead = '?') {
   std::replace_if(text.begin(), text.end(), isControlCharacter, instead);
   return text;
 }
 
-// `text` with a '?' for each of them and for each byte beyond ASCII: for what may be cut within a character,
-// or is of no known encoding.
+// Returns `text` with a '?' in place of each control character and each byte beyond ASCII. For text that may
+// be cut within a character, or whose encoding is not known.
 inline std::string printableAscii(std::string text) {
   std::replace_if(
       text.begin(), text.end(), [](char byte) { return byte < ' ' || byte > '~'; }, '?');

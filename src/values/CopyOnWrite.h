@@ -7,10 +7,10 @@
 
 namespace tonewerk {
 
-// A pointer to a T that is shared until somebody writes: copies cost a reference count, and write() gives the
-// writer a T of its own. Null until the first write; a reader of null sees nothing.
+// Points to a T that copies share until one of them writes. A copy costs a reference count; write() gives the
+// writer a T of its own. It is null until the first write.
 //
-// std::shared_ptr would not do: its use_count() does not order a writer behind the last other reader.
+// std::shared_ptr does not fit: its use_count() does not order a writer after the last other reader.
 template <typename T>
 class CopyOnWrite {
  public:
@@ -29,7 +29,7 @@ class CopyOnWrite {
 
   const T* read() const { return node_ == nullptr ? nullptr : &node_->value; }
 
-  // A T that nobody else sees. Copies the old one when it is shared.
+  // Returns a T that no other pointer shares. Copies the old one when it is shared.
   T& write() {
     if (node_ == nullptr) {
       node_ = new Node();

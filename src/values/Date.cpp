@@ -14,7 +14,8 @@ std::string textOf(Date date) {
       253402300800.0;  // 10000-01-01T00:00:00Z; no double tells its last microsecond apart
   const double seconds = std::isnan(date.seconds) ? 0.0 : std::clamp(date.seconds, kFirst, kEnd);
 
-  // Seconds and microseconds apart: a double of today's date has no digits to spare for a product.
+  // Computes seconds and microseconds separately: a double that holds a current date has no digits left for a
+  // product of both.
   double whole = std::floor(seconds);
   double micros = std::round((seconds - whole) * 1e6);
   if (micros >= 1e6) {

@@ -7,10 +7,10 @@
 
 namespace tonewerk {
 
-// How long to wait before the next attempt: the first delay, then with each failure in a row `factor` times
-// as long as before, up to the limit. So a peer that restarts is followed promptly, and one that stays away
-// costs little. Who needs chance in it, so that many do not all come back at once, adds it to what next()
-// gives.
+// Computes how long to wait before the next attempt. The first delay is `first`; after each failure in a row
+// it is `factor` times the one before, up to `limit`. A caller so reconnects soon to a peer that restarts,
+// and spends little on one that stays away. It adds no randomness: a caller that needs some, so that many
+// peers do not return at the same time, adds it to what next() returns.
 class GrowingDelay {
  public:
   using Duration = std::chrono::nanoseconds;
@@ -19,7 +19,7 @@ class GrowingDelay {
       : first_(first), limit_(limit), factor_(factor) {}
 
   constexpr Duration next() { return std::exchange(next_, std::min(grown(), limit_)); }
-  // An attempt was good: the next delay is the first again.
+  // Call after a successful attempt: the next delay is the first one again.
   constexpr void reset() { next_ = first_; }
 
  private:

@@ -9,8 +9,8 @@
 
 namespace tonewerk {
 
-// The standard library's mutexes and condition variable, in types that clang's analysis knows: it refuses code that
-// reads or writes a GUARDED_BY member without the lock. They cost what the standard's cost.
+// Wrap the standard library's mutexes and condition variable in types that clang's analysis knows. It rejects
+// code that reads or writes a GUARDED_BY member without the lock. They cost as much as the standard's.
 //
 //   Mutex mutex_;
 //   Condition changed_;
@@ -19,7 +19,8 @@ namespace tonewerk {
 //   MutexLock lock(mutex_);
 //   while (tasks_.empty()) changed_.wait(lock);
 //
-// There is no wait with a predicate: the analysis does not know inside a lambda that the lock is held.
+// There is no wait with a predicate, because the analysis does not know inside a lambda that the lock is
+// held.
 class CAPABILITY("mutex") Mutex {
  public:
   Mutex() = default;
@@ -35,7 +36,7 @@ class CAPABILITY("mutex") Mutex {
   std::mutex mutex_;
 };
 
-// Holds a mutex until its scope ends; may let go of it in between.
+// Holds a mutex until its scope ends; may release it and lock it again in between.
 class SCOPED_CAPABILITY MutexLock {
  public:
   explicit MutexLock(Mutex& mutex) ACQUIRE(mutex) : lock_(mutex.mutex_) {}
@@ -51,7 +52,8 @@ class SCOPED_CAPABILITY MutexLock {
   std::unique_lock<std::mutex> lock_;
 };
 
-// What threads wait for; the lock is free while they wait. A wait may end without a reason, so callers wait in a loop.
+// Lets threads wait for a change; the mutex is unlocked while they wait. A wait may end without a
+// notification, so callers wait in a loop.
 class Condition {
  public:
   void notifyOne() { condition_.notify_one(); }
@@ -59,7 +61,7 @@ class Condition {
 
   void wait(MutexLock& lock) { condition_.wait(lock.lock_); }
 
-  // False when the time came before a notification.
+  // Returns false when the time was reached before a notification.
   template <typename Clock, typename Duration>
   bool waitUntil(MutexLock& lock, const std::chrono::time_point<Clock, Duration>& time) {
     return condition_.wait_until(lock.lock_, time) == std::cv_status::no_timeout;
@@ -69,7 +71,7 @@ class Condition {
   std::condition_variable condition_;
 };
 
-// A mutex that the thread which holds it may lock again.
+// A mutex that the thread that holds it may lock again.
 class CAPABILITY("mutex") RecursiveMutex {
  public:
   RecursiveMutex() = default;

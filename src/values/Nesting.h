@@ -7,8 +7,8 @@ namespace tonewerk {
 
 class Value;
 
-// Whether arrays and maps lie inside each other in `value` at most `levels` deep; a value that is neither has
-// none. O(values).
+// Returns whether arrays and maps are nested at most `levels` deep in `value`. A value that is neither an
+// array nor a map has no level. O(number of values).
 bool nestsWithin(const Value& value, std::size_t levels);
 
 }  // namespace tonewerk

@@ -17,7 +17,8 @@ std::uint64_t wordAt(const char* at) {
   return word;
 }
 
-// The text's last `count` bytes, 0 to 8, as one number. Sizes that are known make each copy one instruction.
+// Returns the text's last `count` bytes, 0 to 8, as one number. Constant sizes make each copy one
+// instruction.
 std::uint64_t lastWord(std::string_view text, std::size_t count) {
   const char* end = text.data() + text.size();
   if (text.size() >= sizeof(std::uint64_t)) return wordAt(end - sizeof(std::uint64_t));  // some bytes twice

@@ -9,17 +9,18 @@
 
 namespace tonewerk {
 
-// An immutable text that many holders share: a copy costs a reference count.
+// Holds an immutable text that many holders share: a copy costs a reference count.
 //
-// A payload's keys and texts are of this type, so that storing a message, merging it into the previous values
-// and handing it to a sink copy no characters.
+// A payload's keys and texts are of this type. Storing a message, merging it into the previous values and
+// passing it to a sink therefore copy no characters.
 //
-// Thread-safe as an int is: different objects on different threads, also when they share their characters.
+// As thread-safe as an int: threads may use different objects at the same time, even when these share their
+// characters.
 class SharedString {
  public:
   // The empty text. Allocates nothing.
   SharedString() = default;
-  // Copies `text` into one allocation. Implicit, because a text is a text.
+  // Copies `text` into one allocation. Implicit, because the conversion loses nothing.
   SharedString(std::string_view text);
   SharedString(const char* text) : SharedString(std::string_view(text)) {}
   SharedString(const std::string& text) : SharedString(std::string_view(text)) {}
@@ -40,12 +41,13 @@ class SharedString {
   std::size_t size() const { return rep_ == nullptr ? 0 : rep_->size; }
   bool empty() const { return size() == 0; }
 
-  // The hash that hashOf() gives for the same characters; computed once, when the text is made.
+  // The hash that hashOf() returns for the same characters. It is computed once, when the text is made.
   std::size_t hash() const { return rep_ == nullptr ? hashOf({}) : rep_->hash; }
-  // Seeded anew in every process, so that no client can choose keys that collide.
+  // The seed is new in each process, so that no client can choose keys that collide.
   static std::size_t hashOf(std::string_view text);
 
-  // True when both are the same allocation (or both empty); cheaper than ==, and false says nothing.
+  // True when both share one allocation (or both are empty). Cheaper than ==; when it is false, the texts may
+  // still be equal.
   bool sharesStorageWith(const SharedString& other) const { return rep_ == other.rep_; }
 
   friend bool operator==(const SharedString& a, const SharedString& b) {

@@ -8,10 +8,10 @@
 
 namespace tonewerk {
 
-// The start of a UTF-8 text, at most `mostBytes` long and cut between two characters.
-inline std::string_view shortened(std::string_view text, std::size_t mostBytes) {
-  if (text.size() <= mostBytes) return text;
-  std::size_t end = mostBytes;
+// Returns the start of a UTF-8 text: at most `maxBytes` bytes, cut between two characters.
+inline std::string_view shortened(std::string_view text, std::size_t maxBytes) {
+  if (text.size() <= maxBytes) return text;
+  std::size_t end = maxBytes;
   while (end > 0 && isUtf8Continuation(text[end])) --end;
   return text.substr(0, end);
 }

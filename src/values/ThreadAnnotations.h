@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-// What a declaration says about locks, in words that clang checks (-Wthread-safety, an error in the presets `dev` and
-// `tsan`). Other compilers see nothing of them.
+// Declare which locks code needs; clang checks it (-Wthread-safety, an error in the presets `dev` and
+// `tsan`). Other compilers ignore it.
 //
 //   int count_ GUARDED_BY(mutex_) = 0;         // read and written only while mutex_ is held
 //   void removeOldest() REQUIRES(mutex_);      // the caller holds mutex_

@@ -11,9 +11,9 @@ namespace tonewerk {
 template <typename Signature>
 class UniqueFunction;
 
-// A callable that can be moved but not copied, so that it may own what it works on (a payload, a reply, a
-// token whose destruction means something). Empty when made without a callable or moved from; calling it then
-// is an error.
+// Holds a callable that can be moved but not copied, so that the callable may own what it works on (a
+// payload, a reply, a token whose destruction has an effect). It is empty when made without a callable or
+// moved from; calling an empty one is an error.
 template <typename Result, typename... Arguments>
 class UniqueFunction<Result(Arguments...)> {
  public:

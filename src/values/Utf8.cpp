@@ -13,7 +13,7 @@ constexpr std::string_view kReplacement = "\xEF\xBF\xBD";  // U+FFFD
 
 std::uint8_t byteAt(std::string_view text, std::size_t at) { return static_cast<std::uint8_t>(text[at]); }
 
-// How many bytes a character has that begins with `first`; 0 when none does.
+// Returns how many bytes a character has whose first byte is `first`; 0 when no character begins with it.
 std::size_t announcedLength(std::uint8_t first) {
   if (first < 0x80) return 1;
   if (first >= 0xC2 && first <= 0xDF) return 2;
@@ -22,14 +22,14 @@ std::size_t announcedLength(std::uint8_t first) {
   return 0;
 }
 
-// Overlong forms, surrogates and what lies beyond U+10FFFF show in the second byte.
+// The second byte shows overlong forms, surrogates and code points beyond U+10FFFF.
 bool mayFollow(std::uint8_t first, std::uint8_t second) {
-  const std::uint8_t least = first == 0xE0 ? 0xA0 : first == 0xF0 ? 0x90 : 0x80;
-  const std::uint8_t most = first == 0xED ? 0x9F : first == 0xF4 ? 0x8F : 0xBF;
-  return second >= least && second <= most;
+  const std::uint8_t minimum = first == 0xE0 ? 0xA0 : first == 0xF0 ? 0x90 : 0x80;
+  const std::uint8_t maximum = first == 0xED ? 0x9F : first == 0xF4 ? 0x8F : 0xBF;
+  return second >= minimum && second <= maximum;
 }
 
-// How many bytes at the start of `text` could be, or are, a character's; at least 1.
+// Returns how many bytes at the start of `text` are a character, or may be the beginning of one; at least 1.
 std::size_t matchingBytes(std::string_view text, std::size_t announced) {
   std::size_t count = 1;
   while (count < announced && count < text.size()) {
@@ -41,7 +41,7 @@ std::size_t matchingBytes(std::string_view text, std::size_t announced) {
   return count;
 }
 
-// Of a well-formed sequence: U+FDD0 to U+FDEF, and the last two of every plane.
+// Takes a well-formed sequence. The noncharacters are U+FDD0 to U+FDEF and the last two of every plane.
 bool isNoncharacter(std::string_view sequence) {
   if (sequence.size() < 3) return false;
   const std::size_t last = sequence.size() - 1;
@@ -54,11 +54,12 @@ bool isNoncharacter(std::string_view sequence) {
 
 enum class Noncharacters { kTaken, kRefused };
 
-// How much of the start of `text` is well-formed, and has no noncharacter where they are refused.
+// Returns how many bytes at the start of `text` are well-formed and, where noncharacters are refused, contain
+// none.
 std::size_t validBytes(std::string_view text, Noncharacters noncharacters) {
   std::size_t at = 0;
   while (at < text.size()) {
-    // Nearly all text is ASCII: eight bytes at a time while none has its high bit set.
+    // Nearly all text is ASCII: skip eight bytes at a time while no high bit is set.
     std::uint64_t word = 0;
     if (text.size() - at >= sizeof(word)) {
       std::memcpy(&word, text.data() + at, sizeof(word));

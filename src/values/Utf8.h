@@ -7,27 +7,29 @@
 
 namespace tonewerk {
 
-// The length of the character at the start of `text`, which is not empty; 0 when no well-formed one is there.
+// Returns the length in bytes of the character at the start of `text`, which must not be empty; 0 when no
+// well-formed character is there.
 std::size_t utf8CharacterLength(std::string_view text);
 
-// Whether `byte` goes on with a character that another one begins.
+// Returns whether `byte` continues a character that an earlier byte begins.
 inline bool isUtf8Continuation(char byte) { return (static_cast<unsigned char>(byte) & 0xC0U) == 0x80U; }
 
-// The characters of `text`: of each sequence the first byte counts, also where it is not well-formed.
+// Returns the number of characters in `text`. It counts the first byte of each sequence, also where the text
+// is not well-formed.
 std::size_t utf8Characters(std::string_view text);
 
-// Whether `text` is well-formed UTF-8: no overlong forms, no surrogates, nothing above U+10FFFF. Zero bytes
-// are text.
+// Returns whether `text` is well-formed UTF-8: no overlong forms, no surrogates, nothing above U+10FFFF. Zero
+// bytes are allowed.
 bool isUtf8(std::string_view text);
 
-// The same, and none of Unicode's 66 noncharacters (U+FDD0 to U+FDEF, and U+xFFFE and U+xFFFF of every
-// plane): what clients may say. The D-Bus library takes no others, and what is text does not depend on the
-// way that it comes.
+// Returns whether `text` is UTF-8 that clients may send: isUtf8(), without Unicode's 66 noncharacters (U+FDD0
+// to U+FDEF, and U+xFFFE and U+xFFFF of every plane). The D-Bus library refuses noncharacters, and the same
+// rule applies to every transport.
 bool isText(std::string_view text);
 
-// `text` with U+FFFD for what isText() does not take: one for each byte that begins no character, one for the
-// beginning of a character that goes no further, and one for a noncharacter. For texts that others choose and
-// nobody has checked, where they come in: what keeps and sends reports takes no other texts.
+// Returns `text` with U+FFFD in place of everything that isText() refuses: one for each byte that begins no
+// character, one for an incomplete character, one for a noncharacter. Call it where unchecked text from other
+// programs comes in; the code that stores and sends reports accepts no other text.
 std::string validUtf8(std::string text);
 
 }  // namespace tonewerk

@@ -26,10 +26,10 @@ std::int64_t saturated(double number) {
   return static_cast<std::int64_t>(number);
 }
 
-// The characters at the start of a text that make a decimal number: spaces, sign, digits, fraction, exponent.
+// The characters at the start of a text that form a decimal number: sign, digits, fraction, exponent.
 struct LeadingNumber {
-  std::string_view text;  // without spaces and plus sign; empty without a digit
-  bool isWhole = true;    // neither fraction nor exponent
+  std::string_view text;  // without leading spaces and plus sign; empty when there is no digit
+  bool isWhole = true;    // has neither a fraction nor an exponent
 };
 
 LeadingNumber leadingNumber(std::string_view text) {
@@ -71,7 +71,7 @@ double doubleOf(std::string_view digits) {
   double result = 0.0;
   const auto parsed = std::from_chars(digits.data(), digits.data() + digits.size(), result);
   if (parsed.ec != std::errc::result_out_of_range) return result;
-  // Too large or too small for a double; from_chars does not tell which, strtod does.
+  // The number is too large or too small for a double. from_chars does not say which; strtod does.
   return std::strtod(std::string(digits).c_str(), nullptr);
 }
 

@@ -15,18 +15,18 @@
 
 namespace tonewerk {
 
-// One property-list value: a boolean, a signed or unsigned 64-bit integer, a double, a text (UTF-8), a date,
-// an array or a map. 16 bytes; a copy costs at most a reference count.
+// Holds one property-list value: a boolean, a signed or unsigned 64-bit integer, a double, a text (UTF-8), a
+// date, an array or a map. It has 16 bytes; a copy costs at most a reference count.
 //
-// Equality is that of property lists: numbers compare by value across their forms, exactly; a boolean counts
-// as the number 0 or 1; a date never equals a number; NaN equals NaN, so that a value always equals its copy.
+// Equality follows property lists: numbers compare exactly by value, whatever their form; a boolean counts as
+// the number 0 or 1; a date never equals a number; NaN equals NaN, so that a value always equals its copy.
 class Value {
  public:
   enum class Kind { kBoolean, kInteger, kUnsigned, kDouble, kString, kDate, kArray, kMap };
 
-  // false. A value is never absent: absence is a null pointer or an empty optional.
+  // Makes false. A value is never absent: a null pointer or an empty optional stands for absence.
   Value() : value_(false) {}
-  // A template, so that a pointer does not turn into a boolean.
+  // A template, so that a pointer does not convert to a boolean.
   template <std::same_as<bool> T>
   Value(T value) : value_(value) {}
   Value(double value) : value_(value) {}
@@ -44,7 +44,7 @@ class Value {
 
   Kind kind() const { return static_cast<Kind>(value_.index()); }
 
-  // What is inside, or null when it is of another kind.
+  // Return a pointer to the held value, or null when it is of another kind.
   const bool* asBoolean() const { return std::get_if<bool>(&value_); }
   const std::int64_t* asInteger() const { return std::get_if<std::int64_t>(&value_); }
   const std::uint64_t* asUnsigned() const { return std::get_if<std::uint64_t>(&value_); }
@@ -54,24 +54,24 @@ class Value {
   const ValueArray* asArray() const { return std::get_if<ValueArray>(&value_); }
   const ValueMap* asMap() const { return std::get_if<ValueMap>(&value_); }
 
-  // Readings with conversion; none fails.
+  // Convert the value; no conversion fails.
   //
-  // Of a number: not zero (NaN is not zero). Of a text: begins with Y, y, T or t, or its leading number is
-  // not zero. Of arrays and maps: false.
+  // A number is true when it is not zero; NaN is true. A text is true when it begins with Y, y, T or t, or
+  // when its leading number is not zero. Arrays and maps are false.
   bool boolean() const;
-  // Of a double: truncated, saturating, 0 for NaN. Of an unsigned one: saturating. Of a text: its leading
-  // number (spaces, sign, digits, fraction, exponent), 0 without one. Of a date: its seconds. Of arrays and
-  // maps: 0.
+  // A double is truncated and saturates; NaN is 0. An unsigned integer saturates. A text becomes its leading
+  // number (spaces, sign, digits, fraction, exponent), or 0 when it has none. A date becomes its seconds.
+  // Arrays and maps become 0.
   std::int64_t integer() const;
-  // The low 32 bits: of an integer, signed or unsigned, its own; else those of integer().
+  // Returns the low 32 bits: those of the integer itself, signed or unsigned, else those of integer().
   std::int32_t integer32() const;
   double number() const;
 
-  // What "%@" prints: integers in decimal, booleans "1" and "0", doubles as textOf() below, texts as they
-  // are, dates as RFC 3339, arrays and maps as compact JSON.
+  // Returns what "%@" prints: integers in decimal, booleans as "1" and "0", doubles as textOf() below, texts
+  // unchanged, dates as RFC 3339, arrays and maps as compact JSON.
   std::string text() const;
 
-  // Roughly what it holds on the heap, in bytes, without the 16 of its own. O(1).
+  // Returns about how many bytes the value holds on the heap, without its own 16 bytes. O(1).
   std::size_t bytes() const;
 
   friend bool operator==(const Value& a, const Value& b);
@@ -85,11 +85,12 @@ struct ValueMapEntry {
   Value value;
 };
 
-// The shortest digits that read back as the same double: fixed notation from 1e-4 to below 1e16, else as
-// "1e+22", without a trailing ".0" (2.0 is "2"); "nan", "inf", "-inf", "-0".
+// Returns the shortest digits that read back as the same double. The notation is fixed from 1e-4 to below
+// 1e16 and scientific ("1e+22") otherwise, without a trailing ".0" (2.0 is "2"). The special values are
+// "nan", "inf", "-inf" and "-0".
 std::string textOf(double value);
 
-// What "%@" prints for a value that may be absent: "(null)" for null.
+// Returns what "%@" prints for a value that may be absent: "(null)" for null.
 std::string textOf(const Value* value);
 
 inline bool booleanOf(const Value* value) { return value != nullptr && value->boolean(); }

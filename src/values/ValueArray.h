@@ -11,7 +11,8 @@ namespace tonewerk {
 
 class Value;  // values/Value.h, which a user of this header includes
 
-// A list of values with value semantics. A copy costs a reference count; adding to a shared one copies it.
+// Holds a list of values with value semantics. A copy costs a reference count; appending to a shared list
+// copies it first.
 class ValueArray {
  public:
   ValueArray();
@@ -30,10 +31,10 @@ class ValueArray {
   const Value* end() const;
   void append(Value value);
 
-  // Roughly what it holds on the heap, in bytes. O(1).
+  // Returns about how many bytes the array holds on the heap. O(1).
   std::size_t bytes() const;
 
-  // Element by element.
+  // Compares element by element.
   friend bool operator==(const ValueArray& a, const ValueArray& b);
 
  private:

@@ -16,10 +16,10 @@ namespace {
 constexpr double kTwoTo63 = 9223372036854775808.0;
 constexpr double kTwoTo64 = 18446744073709551616.0;
 
-// What a word that follows means: values of different kinds never begin alike.
+// The meaning of the word that follows: values of different kinds never begin with the same tag.
 enum class Tag : std::uint64_t { kNegative = 1, kWhole, kFraction, kNan, kDate, kString, kArray, kMap };
 
-// Of this process. Factors that are odd lose nothing of the other one.
+// The keys of this process. Multiplying by an odd factor loses no bits.
 struct Keys {
   ValueDigest start{randomKey(), randomKey()};
   ValueDigest factor{randomKey() | 1, randomKey() | 1};
@@ -30,7 +30,7 @@ const Keys& keys() {
   return drawn;
 }
 
-// Takes words in order. The two halves know nothing of each other's keys.
+// Takes words in order. The two halves use independent keys.
 class Digester {
  public:
   void add(std::uint64_t word) {
@@ -68,7 +68,7 @@ void Digester::addWhole(std::int64_t number) {
   add(static_cast<std::uint64_t>(number));
 }
 
-// A double without a fraction equals the integer, where there is one.
+// A double without a fraction is digested like the integer that it equals, if there is one.
 void Digester::addNumber(double number) {
   if (std::isnan(number)) return add(Tag::kNan);
   if (std::trunc(number) == number && number >= -kTwoTo63 && number < kTwoTo63) {
@@ -84,7 +84,7 @@ void Digester::addInstant(Date date) {
   addNumber(date.seconds);
 }
 
-// Whatever the order: entries are digested each for itself and added up.
+// Digests each entry separately and adds the digests, so that the order does not matter.
 void Digester::add(const ValueMap& map) {
   ValueDigest sum;
   for (const ValueMapEntry& entry : map) {

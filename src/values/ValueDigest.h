@@ -7,13 +7,15 @@ namespace tonewerk {
 
 class ValueMap;
 
-// 128 bits that stand for a map, for whoever wants to know later whether another one equals it and must not
-// keep it. Equal maps, as values compare, have equal digests whatever their order and their numbers' forms.
+// Stands for a map with 128 bits, for code that wants to know later whether another map equals it but must
+// not keep the map. Equal maps have equal digests, whatever the order of their entries and the forms of their
+// numbers.
 //
-// Others have different ones but for an accident. Both halves are keyed hashes whose keys are drawn anew for
-// each process, so that nobody can look for two maps of one digest beforehand: two maps of a megabyte meet
-// with a chance below 2^-80. Not for comparing across processes, and no proof against somebody who sees
-// digests. Costs about two multiplications for each eight bytes.
+// Different maps have different digests, except by accident. Both halves are keyed hashes whose keys are new
+// in each process, so that nobody can search in advance for two maps with one digest: two maps of a megabyte
+// collide with a probability below 2^-80. Digests of different processes cannot be compared, and a digest is
+// not safe against somebody who sees digests. Computing one costs about two multiplications for each eight
+// bytes.
 struct ValueDigest {
   static ValueDigest of(const ValueMap& map);
 

@@ -14,12 +14,12 @@
 namespace tonewerk {
 namespace {
 
-// Up to here a walk over the keys is quicker than a probe.
+// Up to this size, walking over the keys is faster than a hash probe.
 constexpr std::size_t kMaxWithoutIndex = 16;
 
 }  // namespace
 
-// The entries in order, and above kMaxWithoutIndex a hash table of their places with linear probing.
+// Holds the entries in order and, above kMaxWithoutIndex, a hash table of their places with linear probing.
 struct ValueMap::Rep {
   std::vector<Entry> entries;
   std::vector<std::uint32_t>
@@ -44,7 +44,7 @@ struct ValueMap::Rep {
     if (!slots.empty()) return probe(key.view(), key.hash());
     const std::size_t hash = key.hash();
     for (Entry& entry : entries) {
-      // Keys of one client often differ only in their last characters; hashes differ at once.
+      // Keys of one client often differ only in their last characters; their hashes differ.
       if (entry.key.hash() == hash && entry.key == key) return &entry;
     }
     return nullptr;
@@ -59,7 +59,7 @@ struct ValueMap::Rep {
     return nullptr;
   }
 
-  // A text that stays the same is not touched: its count is shared with other threads.
+  // Leaves an unchanged text as it is, because other threads share its reference count.
   void replace(Entry& entry, const Value& value) {
     const SharedString* before = entry.value.asString();
     const SharedString* after = value.asString();
@@ -119,7 +119,7 @@ const ValueMap::Entry* ValueMap::end() const { return begin() + size(); }
 const Value* ValueMap::find(std::string_view key) const {
   const Rep* rep = rep_.read();
   if (rep == nullptr) return nullptr;
-  // The search itself changes nothing; only its result type does for the writers' sake.
+  // The search changes nothing. It returns a non-const entry because writers use it, too.
   const Entry* entry = const_cast<Rep*>(rep)->find(key);
   return entry == nullptr ? nullptr : &entry->value;
 }
@@ -159,7 +159,7 @@ bool ValueMap::erase(std::string_view key) {
   if (rep.entries.size() > kMaxWithoutIndex) {
     rep.indexAll();
   } else {
-    rep.slots.clear();  // a table of few slots would fill up unnoticed
+    rep.slots.clear();  // append() does not enlarge a table for so few entries
   }
   return true;
 }
@@ -171,7 +171,7 @@ void ValueMap::merge(const ValueMap& other) {
   }
   if (sharesStorageWith(other)) return;
   Rep& rep = rep_.write();
-  std::size_t guess = 0;  // maps that are merged again and again mostly list their keys in one order
+  std::size_t guess = 0;  // maps that are merged repeatedly mostly list their keys in the same order
   for (const Entry& entry : other) {
     const bool guessed = guess < rep.entries.size() && rep.entries[guess].key.sharesStorageWith(entry.key);
     Entry* own = guessed ? &rep.entries[guess] : rep.find(entry.key);
@@ -201,7 +201,7 @@ bool ValueMap::equalsIgnoring(const ValueMap& other, std::initializer_list<std::
   const auto isIgnored = [&](std::string_view key) {
     return std::find(ignored.begin(), ignored.end(), key) != ignored.end();
   };
-  const Entry* guess = other.begin();  // messages of one kind mostly list their keys in one order
+  const Entry* guess = other.begin();  // messages of one kind mostly list their keys in the same order
   std::size_t common = 0;              // keys that both have, ignored ones included
   for (const Entry& entry : *this) {
     const bool guessed = guess != other.end() && guess->key == entry.key;
@@ -220,7 +220,7 @@ bool ValueMap::equalsIgnoring(const ValueMap& other, std::initializer_list<std::
 
 std::string ValueMap::text() const {
   std::string out;
-  out.reserve(bytes());  // mostly enough: what a value holds is seldom shorter than its text
+  out.reserve(bytes());  // mostly enough: a value's text is seldom longer than the value
   appendCompactJson(out, *this);
   return out;
 }

@@ -15,19 +15,19 @@ namespace tonewerk {
 class Value;  // values/Value.h, which a user of this header includes
 struct ValueMapEntry;
 
-// A string-keyed map of property-list values: a message's payload, a session's configuration, a report.
+// Maps texts to property-list values: a message's payload, a session's configuration, a report.
 //
-// Value semantics by copy-on-write. Iteration gives insertion order; replacing a value keeps its key's place.
+// It has value semantics by copy-on-write. Iteration follows insertion order; replacing a value keeps its
+// key's place.
 //   copy                 a reference count, whatever the size
 //   look-up              up to 16 entries a walk over the keys, above that one hash probe
 //   set, first write     amortised O(1); on a map that shares its storage first a copy of n entries
-//   (reference
-//                        counts, no characters)
+//                        (reference counts, no characters)
 //   erase                O(n), to keep the order
 //   merge of m entries   m look-ups and sets; into an empty map a reference count
 //   ==                   a walk of one side with look-ups in the other; O(1) when both share storage
 //
-// Thread-safe as an int is: two maps that share storage may be used, and written, on two threads.
+// As thread-safe as an int: two threads may use, and write, two maps that share storage.
 class ValueMap {
  public:
   using Entry = ValueMapEntry;
@@ -45,37 +45,38 @@ class ValueMap {
   const Entry* begin() const;
   const Entry* end() const;
 
-  // Null when absent; valid until the next write to this map.
+  // Returns null when the key is absent. The pointer is valid until the next write to this map.
   const Value* find(std::string_view key) const;
   bool contains(std::string_view key) const { return find(key) != nullptr; }
 
-  // Readings with conversion (see Value); false, 0 and the empty text when absent.
+  // Convert the value (see Value). An absent value is false, 0 or the empty text.
   bool boolean(std::string_view key) const;
   std::int64_t integer(std::string_view key) const;
   double number(std::string_view key) const;
   std::string text(std::string_view key) const;
 
   void set(SharedString key, Value value);
-  // The same for a key that is known not to be there, without looking for it.
+  // Sets a key that the map does not hold yet, without looking for it.
   void add(SharedString key, Value value);
-  // True when there was something to erase.
+  // Returns true when the key was there.
   bool erase(std::string_view key);
-  // Sets every entry of `other`, whose values win.
+  // Sets every entry of `other`; the values of `other` replace those of this map.
   void merge(const ValueMap& other);
-  // Makes room for `count` entries in all.
+  // Makes room for `count` entries in total.
   void reserve(std::size_t count);
 
-  // Roughly what it holds on the heap, in bytes: entries, keys, values, nested ones included. O(1).
+  // Returns about how many bytes the map holds on the heap: entries, keys and values, nested ones included.
+  // O(1).
   std::size_t bytes() const;
-  // True when both are the same storage: equal at no cost. False says nothing.
+  // True when both share their storage; they are then equal. When it is false, they may still be equal.
   bool sharesStorageWith(const ValueMap& other) const { return rep_.sharesWith(other.rep_); }
 
-  // Equal when both hold the same keys with equal values, whatever their order.
+  // Equal when both hold the same keys with equal values, in any order.
   friend bool operator==(const ValueMap& a, const ValueMap& b);
-  // The same with some keys left out on both sides.
+  // Compares without the `ignored` keys, on both sides.
   bool equalsIgnoring(const ValueMap& other, std::initializer_list<std::string_view> ignored) const;
 
-  // Compact JSON.
+  // Returns the map as compact JSON.
   std::string text() const;
 
  private:

@@ -16,7 +16,7 @@ std::vector<ChanmeterKey> keysOf(const ChanmeterRecords& records) {
 }
 
 template <typename T>
-void sortOnce(std::vector<T>& items) {
+void sortAndRemoveDuplicates(std::vector<T>& items) {
   std::sort(items.begin(), items.end());
   items.erase(std::unique(items.begin(), items.end()), items.end());
 }
@@ -24,18 +24,18 @@ void sortOnce(std::vector<T>& items) {
 }  // namespace
 
 ChanmeterChannelSet::ChanmeterChannelSet(std::vector<ChanmeterKey> keys) : keys_(std::move(keys)) {
-  sortOnce(keys_);
+  sortAndRemoveDuplicates(keys_);
   for (const ChanmeterKey& key : keys_) {
     if (groups_.empty() || groups_.back() != key.group) groups_.push_back(key.group);
   }
-  sortOnce(groups_);
+  sortAndRemoveDuplicates(groups_);
 }
 
 ChanmeterChannelSet::ChanmeterChannelSet(const ChanmeterRecords& records)
     : ChanmeterChannelSet(keysOf(records)) {}
 
 bool ChanmeterChannelSet::contains(const ChanmeterKey& key) const {
-  // A reading goes through every source for each set; most of what it finds is in another group.
+  // A reading looks up the records of every source in each set; most of them are in another group.
   return std::binary_search(groups_.begin(), groups_.end(), key.group) &&
          std::binary_search(keys_.begin(), keys_.end(), key);
 }

@@ -7,26 +7,27 @@
 
 namespace tonewerk {
 
-// Channels by what they are known by, each once.
+// Holds the keys of channels, each once.
 class ChanmeterChannelSet final : public ChanmeterChannels {
  public:
   explicit ChanmeterChannelSet(std::vector<ChanmeterKey> keys);
-  // Those of `records`.
+  // Takes the channels of `records`.
   explicit ChanmeterChannelSet(const ChanmeterRecords& records);
 
-  // Ascending.
+  // Sorted in ascending order.
   const std::vector<ChanmeterKey>& keys() const { return keys_; }
-  // O(log n); less for one of a group that none of these is in.
+  // O(log n); faster when no channel of the set is in the key's group.
   bool contains(const ChanmeterKey& key) const;
-  // The records of these channels, in their order.
+  // Returns the records of these channels, in the order of `records`.
   ChanmeterRecords selectedFrom(const ChanmeterRecords& records) const;
 
  private:
   std::vector<ChanmeterKey> keys_;
-  std::vector<std::optional<std::string>> groups_;  // of the keys, ascending, each once
+  std::vector<std::optional<std::string>> groups_;  // of the keys; ascending, each once
 };
 
-// Those of `records` that are in that group and subgroup, each of them none for all; in their order.
+// Returns those of `records` that are in that group and subgroup, in their order. None stands for all groups
+// or subgroups.
 ChanmeterRecords chanmeterRecordsIn(const ChanmeterRecords& records, const std::optional<std::string>& group,
                                     const std::optional<std::string>& subGroup);
 

@@ -17,12 +17,12 @@ std::int64_t saturatingDifference(std::int64_t later, std::int64_t earlier) {
   return later - earlier;
 }
 
-// Counters that went back began anew.
-std::uint64_t counted(std::uint64_t later, std::uint64_t earlier) {
+// A counter that went back restarted from zero.
+std::uint64_t counterDifference(std::uint64_t later, std::uint64_t earlier) {
   return later >= earlier ? later - earlier : later;
 }
 
-std::int64_t counted(std::int64_t later, std::int64_t earlier) {
+std::int64_t counterDifference(std::int64_t later, std::int64_t earlier) {
   return later >= earlier ? saturatingDifference(later, earlier) : later;
 }
 
@@ -31,8 +31,8 @@ void subtractStates(std::vector<ChanmeterState>& states, const std::vector<Chanm
       earlier, states, [](const ChanmeterState& state) -> const std::string& { return state.name; });
   for (std::size_t i = 0; i < states.size(); ++i) {
     if (before[i] == nullptr) continue;
-    states[i].transitions = counted(states[i].transitions, before[i]->transitions);
-    states[i].residency = counted(states[i].residency, before[i]->residency);
+    states[i].transitions = counterDifference(states[i].transitions, before[i]->transitions);
+    states[i].residency = counterDifference(states[i].residency, before[i]->residency);
   }
   computeDutyCycles(states);
 }
@@ -41,7 +41,7 @@ void subtractBuckets(std::vector<ChanmeterBucket>& buckets, const std::vector<Ch
   const auto before = counterparts(
       earlier, buckets, [](const ChanmeterBucket& bucket) { return std::tie(bucket.lower, bucket.upper); });
   for (std::size_t i = 0; i < buckets.size(); ++i) {
-    if (before[i] != nullptr) buckets[i].hits = counted(buckets[i].hits, before[i]->hits);
+    if (before[i] != nullptr) buckets[i].hits = counterDifference(buckets[i].hits, before[i]->hits);
   }
 }
 

@@ -12,14 +12,15 @@
 
 namespace tonewerk {
 
-// What a channel is known by. An absent half is less than any text, and equal to itself only.
+// Identifies a channel. An absent part is less than any text, and equal only to an absent part.
 struct ChanmeterKey {
   std::optional<std::string> driver = {};
   std::optional<std::string> group = {};
   std::optional<std::string> subGroup = {};
   std::optional<std::string> name = {};
 
-  // The linter takes the three-way comparison for one with a pointer. NOLINTNEXTLINE(modernize-use-nullptr)
+  // The linter mistakes the three-way comparison for one with a pointer.
+  // NOLINTNEXTLINE(modernize-use-nullptr)
   friend auto operator<=>(const ChanmeterKey&, const ChanmeterKey&) = default;
   friend bool operator==(const ChanmeterKey&, const ChanmeterKey&) = default;
 };
@@ -33,7 +34,7 @@ struct ChanmeterState {
   friend bool operator==(const ChanmeterState&, const ChanmeterState&) = default;
 };
 
-// Without one of its bounds both count as unreadable.
+// When one bound is missing, both count as unreadable.
 struct ChanmeterBucket {
   std::optional<std::int64_t> lower = {};
   std::optional<std::int64_t> upper = {};
@@ -42,9 +43,9 @@ struct ChanmeterBucket {
   friend bool operator==(const ChanmeterBucket&, const ChanmeterBucket&) = default;
 };
 
-// One channel's value at one time, or its change between two times: plain data, whatever it was read from.
-// The format says which of the values count: `value` of a simple channel, `states` of a state channel,
-// `minimum`, `maximum` and `buckets` of a histogram, none of any other.
+// Holds one channel's value at one time, or its change between two times, independent of the source. The
+// format says which members are used: `value` of a simple channel, `states` of a state channel, `minimum`,
+// `maximum` and `buckets` of a histogram, none of any other.
 struct ChanmeterRecord {
   ChanmeterKey key = {};
   std::optional<std::string> unit = {};
@@ -55,13 +56,14 @@ struct ChanmeterRecord {
   std::int64_t maximum = 0;
   std::vector<ChanmeterBucket> buckets = {};
 
-  // Whether it is in that group and subgroup, each of them none for all.
+  // Returns whether the channel is in that group and subgroup. None stands for all.
   bool isIn(const std::optional<std::string>& group, const std::optional<std::string>& subGroup) const;
 
   friend bool operator==(const ChanmeterRecord&, const ChanmeterRecord&) = default;
 };
 
-// In order; immutable and shared, so that many samples of a source that did not change cost little.
+// A list of records in order. They are immutable and shared, so that many samples of an unchanged source cost
+// little.
 using ChanmeterRecords = std::vector<std::shared_ptr<const ChanmeterRecord>>;
 
 }  // namespace tonewerk

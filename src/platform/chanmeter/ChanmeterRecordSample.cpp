@@ -8,7 +8,7 @@
 namespace tonewerk {
 namespace {
 
-// What lies past the largest index cannot be asked for.
+// Elements beyond the largest index cannot be accessed.
 std::int32_t countOf(std::size_t size) {
   constexpr auto kMax = std::numeric_limits<std::int32_t>::max();
   return size > static_cast<std::size_t>(kMax) ? kMax : static_cast<std::int32_t>(size);

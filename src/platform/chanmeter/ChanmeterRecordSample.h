@@ -7,7 +7,7 @@
 
 namespace tonewerk {
 
-// A record under its reader's face. A copy costs a reference count.
+// Presents a record as a ChanmeterSample. A copy costs a reference count.
 class ChanmeterRecordSample final : public ChanmeterSample {
  public:
   // Error numbers of histogramBucketBounds().

@@ -5,7 +5,7 @@
 
 namespace tonewerk {
 
-// Samples, or changes, as records.
+// Holds samples, or changes, as records.
 class ChanmeterRecordSamples final : public ChanmeterSamples {
  public:
   explicit ChanmeterRecordSamples(ChanmeterRecords records);

@@ -7,9 +7,10 @@
 
 namespace tonewerk {
 
-// For each of `later` what it was in `earlier`, by equal keys: the n-th with a key goes with the n-th with
-// that key. Null for what was not there. Points into `earlier`. O(n log n), and O(n) as far as both begin
-// with the same keys, as they do when nothing came or went.
+// Returns, for each element of `later`, the element of `earlier` with the same key; null when there is none.
+// The n-th element with a key is matched with the n-th in `earlier` with that key. The pointers point into
+// `earlier`. O(n log n); O(n) for the part at the beginning where both have the same keys, which is all of it
+// when nothing was added or removed.
 template <typename T, typename KeyOf>
 std::vector<const T*> counterparts(const std::vector<T>& earlier, const std::vector<T>& later,
                                    const KeyOf& keyOf) {

@@ -4,7 +4,7 @@
 namespace tonewerk {
 
 void computeDutyCycles(std::vector<ChanmeterState>& states) {
-  double sum = 0;  // wide enough for any residencies' sum
+  double sum = 0;  // a double, because the sum may exceed 64 bits
   for (const ChanmeterState& state : states) sum += static_cast<double>(state.residency);
   for (ChanmeterState& state : states) {
     state.dutyCycle = sum > 0 ? static_cast<double>(state.residency) / sum : 0.0;

@@ -7,7 +7,7 @@
 
 namespace tonewerk {
 
-// Gives each state its share of all states' residencies; 0 where these sum to 0.
+// Sets each state's duty cycle to its share of the sum of all residencies; 0 when that sum is 0.
 void computeDutyCycles(std::vector<ChanmeterState>& states);
 
 }  // namespace tonewerk

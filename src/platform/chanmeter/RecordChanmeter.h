@@ -5,8 +5,8 @@
 
 namespace tonewerk {
 
-// What a library of channels can do without knowing where its records come from. Who derives from it makes
-// ChanmeterChannelSets and ChanmeterRecordSamples, and passes nothing else in.
+// Implements the part of Chanmeter that does not depend on where records come from. A derived class makes
+// ChanmeterChannelSets and ChanmeterRecordSamples, and passes no other classes in.
 class RecordChanmeter : public Chanmeter {
  public:
   std::int32_t channelCount(const ChanmeterChannels& channels) override;

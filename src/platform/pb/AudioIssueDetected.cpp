@@ -10,7 +10,7 @@ namespace {
 
 enum Tag : std::uint32_t { kTimestamp = 1, kDuration = 2, kIssuetype = 3, kNode = 4, kRtaidclient = 5 };
 
-// Where the field of a tag is kept, when it is one of the byte strings.
+// Returns the byte string that holds the field with this tag; null when the field is not a byte string.
 std::string* bytesOf(AudioIssueDetected& record, std::uint32_t tag) {
   switch (tag) {
     case kIssuetype:
@@ -24,7 +24,7 @@ std::string* bytesOf(AudioIssueDetected& record, std::uint32_t tag) {
   }
 }
 
-// A field of another wire type than its own is skipped like an unknown one. False on an error.
+// Skips a field that has another wire type than expected, like an unknown field. Returns false on an error.
 bool readField(AudioIssueDetected& record, PB::Reader& reader, const PB::Reader::Key& key) {
   const bool isNumber = key.tag == kTimestamp || key.tag == kDuration;
   if (isNumber && key.type == PB::WireType::kVarint) {

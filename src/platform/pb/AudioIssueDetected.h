@@ -13,7 +13,7 @@
 
 namespace tonewerk::diagwiremetrics {
 
-// The metric record of one detected audio issue; docs/audio_issue_detected.proto describes its form.
+// Holds the metric record of one detected audio issue; docs/audio_issue_detected.proto describes its form.
 class AudioIssueDetected final : public PB::Base {
  public:
   static constexpr std::uint32_t kMetricIdentifier = 0x5B0003;
@@ -22,7 +22,7 @@ class AudioIssueDetected final : public PB::Base {
   void writeTo(PB::Writer& writer) const override;
   void formatText(PB::TextFormatter& formatter, std::string_view name) const override;
 
-  // Over what == compares.
+  // Hashes the members that == compares.
   std::size_t hash() const;
   void swap(AudioIssueDetected& other) noexcept { std::swap(*this, other); }
   friend void swap(AudioIssueDetected& a, AudioIssueDetected& b) noexcept { a.swap(b); }

@@ -9,13 +9,13 @@ class Reader;
 class Writer;
 class TextFormatter;
 
-// A record that has a protocol-buffer form.
+// A record with a protocol-buffer form.
 class Base {
  public:
   virtual ~Base() = default;
 
-  // Takes the fields that the input holds and leaves the others as they are. Ends at the end of the input, at
-  // an end-group key, or at an error: then it is false, and what was read before it stays.
+  // Sets the fields that the input holds and leaves the others unchanged. Ends at the end of the input, at an
+  // end-group key, or at an error. On an error it returns false; fields read before it stay set.
   [[nodiscard]] virtual bool readFrom(Reader& reader) = 0;
   virtual void writeTo(Writer& writer) const = 0;
   virtual void formatText(TextFormatter& formatter, std::string_view name) const = 0;

@@ -9,8 +9,8 @@
 
 namespace tonewerk::PB {
 
-// Reads protocol-buffer fields one after the other. After an error nothing more is read: every later call
-// fails.
+// Reads protocol-buffer fields one after the other. After an error it reads nothing more, and every later
+// call fails.
 class Reader {
  public:
   struct Key {
@@ -20,14 +20,14 @@ class Reader {
 
   virtual ~Reader() = default;
 
-  // None at the end of the input and on an error.
+  // Returns none at the end of the input and on an error.
   [[nodiscard]] virtual std::optional<Key> nextKey() = 0;
 
-  // The value behind the key that was read last; each fails when the input ends within it. A varint has at
-  // most ten bytes.
+  // Read the value that follows the last key. Each fails when the input ends within the value. A varint has
+  // at most ten bytes.
   [[nodiscard]] virtual std::optional<std::uint64_t> readVarint() = 0;
   [[nodiscard]] virtual std::optional<std::string> readBytes() = 0;
-  // A group is skipped up to its end.
+  // Skips a value; a group is skipped up to its end.
   [[nodiscard]] virtual bool skip(const Key& key) = 0;
 
   virtual bool hasError() const = 0;

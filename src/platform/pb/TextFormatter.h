@@ -6,14 +6,14 @@
 
 namespace tonewerk::PB {
 
-// Turns a record into text for people: objects with names, fields with names.
+// Converts a record to text for people: named objects with named fields.
 class TextFormatter {
  public:
   virtual ~TextFormatter() = default;
 
   virtual void beginObject(std::string_view name) = 0;
   virtual void format(std::string_view name, std::uint64_t value) = 0;
-  // A byte string, which need not be text.
+  // Takes a byte string, which need not be text.
   virtual void format(std::string_view name, std::string_view value) = 0;
   virtual void endObject() = 0;
 };

@@ -3,7 +3,7 @@
 
 namespace tonewerk::PB {
 
-// How a field's value is laid out behind its key.
+// How a field's value is encoded after its key.
 enum class WireType {
   kVarint = 0,
   kFixed64 = 1,
