@@ -10,25 +10,25 @@ using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 using ::testing::SizeIs;
 
-// One event for each signpost, as long as its name.
+// Returns one event for each signpost; its duration is the length of the signpost's name.
 std::vector<KolviEvent> lengthOf(const std::string& signpost) { return {{signpost.size()}}; }
 
 ValueMap interval(const char* name) { return {{"name", name}, {"type", "interval"}}; }
 
-TEST(KolviTest, AnArrayHoldsItsElementsAndAMapItself) {
+TEST(KolviTest, AnArrayGivesItsElementsAndAMapItself) {
   const ValueArray list{interval("a"), interval("b")};
   EXPECT_EQ(probeDictionariesOf(list), list);
   EXPECT_EQ(probeDictionariesOf(interval("a")), ValueArray{interval("a")});
   EXPECT_EQ(probeDictionariesOf(ValueArray{}), ValueArray{});
 }
 
-TEST(KolviTest, AnyOtherRootHoldsNone) {
+TEST(KolviTest, AnyOtherRootGivesNone) {
   EXPECT_EQ(probeDictionariesOf("text"), std::nullopt);
   EXPECT_EQ(probeDictionariesOf(1), std::nullopt);
   EXPECT_EQ(probeDictionariesOf(true), std::nullopt);
 }
 
-TEST(KolviTest, TheSignpostIsTheNameUnlessItIsGiven) {
+TEST(KolviTest, TheSignpostDefaultsToTheName) {
   const ValueArray list{ValueMap{{"name", "a"}, {"type", "interval"}, {"signpost", "decode"}},
                         interval("bb")};
   EXPECT_THAT(signpostsOf(list), ElementsAre("bb", "decode"));
@@ -39,7 +39,7 @@ TEST(KolviTest, TheSignpostIsTheNameUnlessItIsGiven) {
   EXPECT_EQ(probes[1].events.at(0).timeDuration, 2U);
 }
 
-TEST(KolviTest, ChildrenMakeATree) {
+TEST(KolviTest, ChildrenFormATree) {
   ValueMap parent = interval("parent");
   parent.set("children", ValueArray{interval("one"), interval("two")});
   const ValueArray list{ValueMap{{"name", "group"}, {"children", ValueArray{parent}}}};
@@ -54,13 +54,13 @@ TEST(KolviTest, ChildrenMakeATree) {
   EXPECT_EQ(probes[0].children[0].children[1].name, "two");
 }
 
-TEST(KolviTest, AProbeOfAnotherTypeAsksForNoSignpost) {
+TEST(KolviTest, AProbeOfAnotherTypeNeedsNoSignpost) {
   const ValueArray list{ValueMap{{"name", "a"}, {"type", "counter"}}, ValueMap{{"name", "b"}}};
   EXPECT_THAT(signpostsOf(list), IsEmpty());
   EXPECT_THAT(makeKolviProbes(list, lengthOf), SizeIs(2));
 }
 
-TEST(KolviTest, WhatIsNoProbeIsPassedOver) {
+TEST(KolviTest, ElementsThatAreNotProbesAreSkipped) {
   const ValueArray list{"text", 1, ValueMap{{"type", "interval"}}, interval("a"),
                         ValueMap{{"name", "b"}, {"children", "text"}}};
   EXPECT_THAT(signpostsOf(list), ElementsAre("a"));

@@ -14,9 +14,8 @@ namespace {
 
 using testing::ElementsAre;
 
-// A std::string converts to a string_view and to a Value alike; it used to be printed as a list of its
-// characters.
-TEST(LogTest, ShowsEveryKindOfTextAsItIs) {
+// A std::string converts to both a string_view and a Value. It was once printed as a list of its characters.
+TEST(LogTest, ShowsEveryKindOfTextUnchanged) {
   MemoryLog log;
   const LogCategory category(log, "com.orvane.tonewerk", "twrs");
   const char* const pointer = "d";
@@ -49,7 +48,7 @@ TEST(LogTest, ShowsNumbersByTheirOwnType) {
               ElementsAre("-1 -9000000000 7 3 1 100%", "0.500000 0.5 100000000000000000000.000000"));
 }
 
-TEST(LogTest, ShowsValuesListsAndWhatIsAbsent) {
+TEST(LogTest, ShowsValuesListsAndAbsentValues) {
   MemoryLog log;
   const LogCategory category(log, "com.orvane.tonewerk", "twrs");
   const Value value(ValueMap{{"a", 1}});

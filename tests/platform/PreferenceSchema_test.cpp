@@ -20,29 +20,29 @@ TEST(PreferenceSchemaTest, HasEachPreferenceOnce) {
   EXPECT_EQ(findPreference("com.orvane.metricon", "max_days"), nullptr);
 }
 
-TEST(PreferenceSchemaTest, ADefaultIsWhatThePreferenceMayBe) {
+TEST(PreferenceSchemaTest, ADefaultIsAValidValue) {
   for (const Preference& preference : preferenceSchema()) {
     if (!preference.fallback) continue;
     EXPECT_EQ(problemWith(preference, *preference.fallback), std::nullopt);
   }
 }
 
-TEST(PreferenceSchemaTest, WhatTheDaemonKeepsHasNoDefault) {
+TEST(PreferenceSchemaTest, PreferencesThatTheDaemonSetsHaveNoDefault) {
   for (const Preference& preference : preferenceSchema()) {
     if (preference.keeper != PreferenceKeeper::kDaemon) continue;
     EXPECT_FALSE(preference.fallback) << preference.key;
   }
 }
 
-// They are shown indented by four, also where a terminal has sixty columns.
-TEST(PreferenceSchemaTest, AMeaningIsAShortLine) {
+// Meanings are shown indented by four columns, also in terminals of sixty columns.
+TEST(PreferenceSchemaTest, AMeaningIsOneShortLine) {
   for (const Preference& preference : preferenceSchema()) {
     EXPECT_THAT(preference.meaning.size(), testing::AllOf(testing::Ge(5U), testing::Le(56U)))
         << preference.key;
   }
 }
 
-TEST(PreferenceSchemaTest, KeepsToRangesAtTheirEnds) {
+TEST(PreferenceSchemaTest, ChecksBothEndsOfARange) {
   const Preference& cycle = *findPreference("com.orvane.tonewerk.twreporting", "io_cycle");
   EXPECT_EQ(problemWith(cycle, 0), std::nullopt);
   EXPECT_EQ(problemWith(cycle, 2147483647), std::nullopt);
@@ -56,7 +56,7 @@ TEST(PreferenceSchemaTest, KeepsToRangesAtTheirEnds) {
   EXPECT_NE(problemWith(days, std::numeric_limits<double>::quiet_NaN()), std::nullopt);
 }
 
-TEST(PreferenceSchemaTest, TellsTypesApart) {
+TEST(PreferenceSchemaTest, DistinguishesTypes) {
   const std::pair<PreferenceType, Value> fitting[] = {
       {PreferenceType::kBoolean, true},
       {PreferenceType::kInteger, 5},

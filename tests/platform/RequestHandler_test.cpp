@@ -18,14 +18,14 @@ class RecordingCounter final : public InFlightCounter {
   std::size_t bytes = 0;
 };
 
-TEST(InFlightTokenTest, FinishesItsRequestOnceWhereverItIsCarried) {
+TEST(InFlightTokenTest, FinishesItsRequestOnceHoweverOftenItIsMoved) {
   const auto counter = std::make_shared<RecordingCounter>();
   {
     InFlightToken token(counter, 10);
     InFlightToken carried = std::move(token);
     InFlightToken other(counter, 5);
     other = std::move(carried);
-    EXPECT_EQ(counter->requests, 1);  // the one that was assigned over
+    EXPECT_EQ(counter->requests, 1);  // the token that was replaced by the assignment
     EXPECT_EQ(counter->bytes, 5U);
   }
   EXPECT_EQ(counter->requests, 2);

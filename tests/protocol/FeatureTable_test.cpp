@@ -6,18 +6,18 @@
 namespace tonewerk {
 namespace {
 
-TEST(FeatureTableTest, APreferenceThatIsFollowedHasItsNotification) {
+TEST(FeatureTableTest, AFollowedPreferenceHasItsNotification) {
   EXPECT_EQ(notificationOfPreference("com.orvane.homedeck", "spatial-audio-accessory-feature"),
             "com.orvane.homedeck.spatial-audio-accessory-feature.changed");
   EXPECT_EQ(notificationOfPreference("com.orvane.tonewerk", "device_name"), "com.orvane.tonewerk.reporting");
 }
 
-TEST(FeatureTableTest, AllOfTheDaemonsOwnAreAnnouncedTogether) {
+TEST(FeatureTableTest, OneNotificationAnnouncesAllOfTheDaemonsPreferences) {
   EXPECT_EQ(notificationOfPreference("com.orvane.tonewerk", "disable_reporting"),
             "com.orvane.tonewerk.reporting");
 }
 
-TEST(FeatureTableTest, OtherPreferencesHaveNone) {
+TEST(FeatureTableTest, OtherPreferencesHaveNoNotification) {
   EXPECT_EQ(notificationOfPreference("com.orvane.homedeck", "device_name"), std::nullopt);
   EXPECT_EQ(notificationOfPreference("com.orvane.homedeck", "ringerstate"), std::nullopt);
   EXPECT_EQ(notificationOfPreference("", "ringerstate"), std::nullopt);

@@ -22,7 +22,7 @@ void expectRefused(ParameterType type, const Argument& argument) {
   EXPECT_NE(problemOf(type, argument), std::nullopt) << (argument ? argument->text() : "nil");
 }
 
-TEST(RequestSetTest, ASignedIntegerHasAllSixtyFourBits) {
+TEST(RequestSetTest, ASignedIntegerHasSixtyFourBits) {
   constexpr ParameterType kType = ParameterType::kInt64;
   for (const Value& value :
        {Value(kLeast), Value(-1), Value(0), Value(kMax), Value(static_cast<std::uint64_t>(kMax))}) {
@@ -31,7 +31,7 @@ TEST(RequestSetTest, ASignedIntegerHasAllSixtyFourBits) {
   expectRefused(kType, Value(static_cast<std::uint64_t>(kMax) + 1));
 }
 
-TEST(RequestSetTest, AThirtyTwoBitIntegerReachesFromZeroTo4294967295) {
+TEST(RequestSetTest, AThirtyTwoBitIntegerIsFromZeroTo4294967295) {
   constexpr ParameterType kType = ParameterType::kUInt32;
   for (const Value& value : {Value(0), Value(0U), Value(4294967295), Value(std::uint64_t{4294967295})}) {
     expectSuits(kType, value);
@@ -41,7 +41,7 @@ TEST(RequestSetTest, AThirtyTwoBitIntegerReachesFromZeroTo4294967295) {
   }
 }
 
-TEST(RequestSetTest, ASixteenBitIntegerReachesFromZeroTo65535) {
+TEST(RequestSetTest, ASixteenBitIntegerIsFromZeroTo65535) {
   constexpr ParameterType kType = ParameterType::kUInt16;
   for (const Value& value : {Value(0), Value(65535), Value(std::uint64_t{65535})}) expectSuits(kType, value);
   for (const Value& value : {Value(-1), Value(65536), Value(std::uint64_t{65536})})
@@ -59,7 +59,7 @@ TEST(RequestSetTest, NothingElseIsAnInteger) {
   }
 }
 
-TEST(RequestSetTest, AMapIsAMap) {
+TEST(RequestSetTest, AMapParameterTakesOnlyAMap) {
   expectSuits(ParameterType::kMap, Value(ValueMap()));
   expectRefused(ParameterType::kMap, Value(ValueArray()));
   expectRefused(ParameterType::kMap, Value("{}"));
@@ -85,7 +85,7 @@ TEST(RequestSetTest, TheNumberOfArgumentsMustBeRight) {
   EXPECT_EQ(problemWith(method, {Value(1), std::nullopt, Value(2)}), "two takes 2 arguments, not 3");
 }
 
-TEST(RequestSetTest, AProblemNamesMethodAndArgument) {
+TEST(RequestSetTest, AProblemNamesTheMethodAndTheArgument) {
   const Method method{"send", {{"id", ParameterType::kInt64}, {"category", ParameterType::kUInt32}}};
   EXPECT_EQ(problemWith(method, {Value(1), Value(-1)}),
             "send: argument 2 (category) must be an integer from 0 to 4294967295");
@@ -104,7 +104,7 @@ TEST(RequestSetTest, FindsAMethodByItsWholeName) {
   EXPECT_EQ(interface.find(""), std::nullopt);
 }
 
-TEST(RequestSetTest, WhatIsForTheOwnerIsForTheDaemonsUserAndRoot) {
+TEST(RequestSetTest, OwnerMethodsAreForTheDaemonsUserAndRoot) {
   constexpr std::uint32_t kOwner = 500;
   const Method method{"watch", {}, {}, 0, true};
   EXPECT_EQ(problemWithCaller(method, kOwner, kOwner), std::nullopt);
@@ -115,12 +115,12 @@ TEST(RequestSetTest, WhatIsForTheOwnerIsForTheDaemonsUserAndRoot) {
   EXPECT_EQ(problemWithCaller(method, 501, 0), refusal);
 }
 
-TEST(RequestSetTest, APeerOfWhomTheKernelSaysNothingIsNobodysOwner) {
+TEST(RequestSetTest, APeerWithoutAUserIsNeverTheOwner) {
   EXPECT_NE(problemWithCaller(Method{"watch", {}, {}, 0, true}, kNoUser, 500), std::nullopt);
   EXPECT_NE(problemWithCaller(Method{"watch", {}, {}, 0, true}, kNoUser, kNoUser), std::nullopt);
 }
 
-TEST(RequestSetTest, EverythingElseIsForEverybody) {
+TEST(RequestSetTest, OtherMethodsAreForEveryUser) {
   EXPECT_EQ(problemWithCaller(Method{"test", {}}, 501, 500), std::nullopt);
   EXPECT_EQ(problemWithCaller(Method{"test", {}}, kNoUser, 500), std::nullopt);
 }

@@ -11,7 +11,7 @@
 
 namespace tonewerk::channels {
 
-// Channel records in few words:
+// Make channel records with little text:
 //
 //   chanmeter.setRecords({simple(speaker("Rail Volts"), 12), histogram(speaker("Delay"), {{0, 10, 5}})});
 

@@ -12,10 +12,10 @@ namespace tonewerk {
 // The service manager's end of the socket that NOTIFY_SOCKET names.
 class NotifySocket {
  public:
-  // No test waits so long unless it fails.
+  // How long to wait for a message. Only a failing test waits that long.
   static constexpr std::chrono::seconds kPatience{30};
 
-  // A test failure where there is none to be had.
+  // Adds a test failure when the socket cannot be made.
   NotifySocket();
   NotifySocket(const NotifySocket&) = delete;
   NotifySocket& operator=(const NotifySocket&) = delete;
@@ -23,14 +23,15 @@ class NotifySocket {
 
   std::string path() const { return directory_.path("notify"); }
 
-  // The messages that are there and were not taken yet, in the order in which they were sent.
+  // Returns the messages that have arrived and were not taken yet, in the order in which they were sent.
   std::vector<std::string> take();
 
-  // Waits for a message that has this line, and drops those before it. Empty when none came in time.
+  // Waits for a message that contains this line, and drops those before it. Returns an empty text when none
+  // came in time.
   std::string waitForLine(const std::string& line);
 
  private:
-  // The next message; empty when none comes before `timeout`.
+  // Returns the next message, or an empty text when none comes within `timeout`.
   std::string next(std::chrono::milliseconds timeout);
 
   const TemporaryDirectory directory_;

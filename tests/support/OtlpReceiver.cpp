@@ -20,11 +20,11 @@
 namespace tonewerk {
 namespace {
 
-constexpr std::chrono::seconds kPatience{20};
+constexpr std::chrono::seconds kTimeout{20};
 constexpr std::size_t kHugeBytes = 100'000'000;
 constexpr std::size_t kMaxRequestBytes = std::size_t{20} << 20;
 
-// A listening socket on a free port of the loopback interface, and the port: 0 when there is none.
+// Returns a listening socket on a free port of the loopback interface, and the port, which is 0 on failure.
 std::pair<int, int> listenOnLoopback() {
   const int descriptor = socket(AF_INET, SOCK_STREAM | SOCK_CLOEXEC, 0);
   sockaddr_in address{};
@@ -57,7 +57,7 @@ std::string valueOf(const OtlpReceiver::Request& request, const std::string& hea
   return found == request.headers.end() ? std::string() : found->second;
 }
 
-// Fills in what stands before the body.
+// Sets the parts of the request that precede the body.
 void parseHead(std::string_view head, OtlpReceiver::Request& request) {
   std::size_t at = head.find("\r\n");
   request.line = head.substr(0, at);
@@ -74,7 +74,7 @@ void parseHead(std::string_view head, OtlpReceiver::Request& request) {
   }
 }
 
-// The unpacked body; false when it is not gzip.
+// Sets `body` to the unpacked body. Returns false when `packed` is not gzip.
 [[nodiscard]] bool unpack(const std::string& packed, std::string& body) {
   z_stream stream{};
   if (inflateInit2(&stream, 15 + 16) != Z_OK) return false;
@@ -126,7 +126,7 @@ void OtlpReceiver::answerNext(Answer answer) {
 }
 
 bool OtlpReceiver::waitForRequests(std::size_t count) {
-  const auto end = std::chrono::steady_clock::now() + kPatience;
+  const auto end = std::chrono::steady_clock::now() + kTimeout;
   MutexLock lock(mutex_);
   while (requests_.size() < count && arrived_.waitUntil(lock, end)) {
   }
@@ -203,7 +203,7 @@ bool OtlpReceiver::readRequest(int connection, Request& request) {
   return true;
 }
 
-// Unpacks the body, too.
+// Also unpacks the body.
 void OtlpReceiver::check(Request& request) {
   std::vector<std::string> found;
   if (request.line != "POST /v1/logs HTTP/1.1") found.push_back("request line: " + request.line);
@@ -246,7 +246,7 @@ void OtlpReceiver::send(int connection, const Answer& answer) {
   (void)sendAll(connection, text + "\r\n" + answer.body);  // the peer may already be gone
 }
 
-// Until the peer has had enough.
+// Sends until the peer closes the connection, at most kHugeBytes.
 void OtlpReceiver::sendForever(int connection, const std::string& beginning) {
   std::string line = "X-Filler: " + std::string(8000, 'x') + "\r\n";
   if (!sendAll(connection, beginning)) return;
@@ -261,7 +261,7 @@ void OtlpReceiver::waitForPeer(int connection) {
   }
 }
 
-// False when the receiver ends.
+// Returns false when the receiver is being destroyed.
 bool OtlpReceiver::waitReadable(int descriptor) {
   pollfd waited[2] = {{descriptor, POLLIN, 0}, {wakeRead_, POLLIN, 0}};
   return poll(waited, 2, -1) > 0 && waited[1].revents == 0;

@@ -13,7 +13,8 @@
 
 namespace tonewerk {
 
-// An OTLP/HTTP endpoint on the loopback interface that forgives nothing and misbehaves when told to.
+// An OTLP/HTTP endpoint on the loopback interface that accepts only correct requests and fails when a test
+// asks for it.
 //
 //   OtlpReceiver receiver;
 //   receiver.answerNext({.status = 503, .headers = {"Retry-After: 1"}});
@@ -21,16 +22,16 @@ namespace tonewerk {
 //   ASSERT_TRUE(receiver.waitForRequests(2));
 //   EXPECT_THAT(receiver.problems(), IsEmpty());
 //
-// Takes one connection at a time and a request a connection. Any thread.
+// It serves one connection at a time and one request for each connection. Any thread.
 class OtlpReceiver {
  public:
   enum class Fault {
     kNone,
-    kHang,        // reads the request, then nothing until the peer goes
-    kGarbage,     // bytes that are no HTTP
-    kHugeBody,    // a body of 100 MB
-    kHugeHeader,  // a header of 100 MB
-    kCutBody,     // announces more than it sends
+    kHang,        // reads the request and sends nothing until the peer closes
+    kGarbage,     // sends bytes that are not HTTP
+    kHugeBody,    // sends a body of 100 MB
+    kHugeHeader,  // sends a header of 100 MB
+    kCutBody,     // announces a longer body than it sends
     kCloseEarly,  // closes without an answer
   };
   struct Answer {
@@ -54,18 +55,18 @@ class OtlpReceiver {
 
   // "http://127.0.0.1:PORT".
   std::string address() const;
-  // An address at which nobody listens.
+  // Returns an address on which nobody listens.
   static std::string deadAddress();
 
-  // Answers the next requests in order, before the usual 200.
+  // Answers the next requests with these, in order; later ones get the usual 200.
   void answerNext(Answer answer);
 
-  // Until there were so many requests, for seconds at most; false when there were fewer.
+  // Waits until `count` requests arrived, at most some seconds. Returns false when there were fewer.
   [[nodiscard]] bool waitForRequests(std::size_t count);
   std::vector<Request> requests() const;
-  // Of all requests: the log records that were accepted or not.
+  // Returns the log records of all requests, accepted or not.
   std::vector<nlohmann::json> records() const;
-  // What is wrong with the requests, by the rules of the transport and of the schema.
+  // Returns what is wrong with the requests, by the rules of the transport and of the schema.
   std::vector<std::string> problems() const;
 
  private:
@@ -89,7 +90,7 @@ class OtlpReceiver {
   std::vector<Request> requests_ GUARDED_BY(mutex_);
   std::vector<std::string> problems_ GUARDED_BY(mutex_);
 
-  std::thread thread_;  // last: it uses all above
+  std::thread thread_;  // last, because it uses all members above
 };
 
 }  // namespace tonewerk

@@ -25,14 +25,14 @@ class Checker {
   }
 
  private:
-  void say(const std::string& at, const std::string& what) { problems.push_back(at + ": " + what); }
+  void addProblem(const std::string& at, const std::string& what) { problems.push_back(at + ": " + what); }
 
   void object(const Json& json, const std::string& at, const Fields& fields) {
-    if (!json.is_object()) return say(at, "is no object");
+    if (!json.is_object()) return addProblem(at, "is no object");
     for (const auto& [key, value] : json.items()) {
       const auto field = fields.find(key);
       if (field == fields.end()) {
-        say(at, "has the unknown key \"" + key + "\"");
+        addProblem(at, "has the unknown key \"" + key + "\"");
       } else {
         std::string place = at;
         place.append(".").append(key);
@@ -41,11 +41,11 @@ class Checker {
     }
   }
   void require(const Json& json, const std::string& at, const std::string& key) {
-    if (json.is_object() && !json.contains(key)) say(at, "lacks \"" + key + "\"");
+    if (json.is_object() && !json.contains(key)) addProblem(at, "lacks \"" + key + "\"");
   }
   Check listOf(void (Checker::*element)(const Json& json, const std::string& at)) {
     return [this, element](const Json& json, const std::string& at) {
-      if (!json.is_array()) return say(at, "is no array");
+      if (!json.is_array()) return addProblem(at, "is no array");
       for (std::size_t n = 0; n < json.size(); ++n)
         (this->*element)(json[n], at + "[" + std::to_string(n) + "]");
     };
@@ -101,7 +101,8 @@ class Checker {
     std::set<std::string> keys;
     for (const Json& entry : json) {
       if (!entry.is_object() || !entry.contains("key") || !entry["key"].is_string()) continue;
-      if (!keys.insert(entry["key"]).second) say(at, "has \"" + entry["key"].get<std::string>() + "\" twice");
+      if (!keys.insert(entry["key"]).second)
+        addProblem(at, "has \"" + entry["key"].get<std::string>() + "\" twice");
     }
   }
   void keyValue(const Json& json, const std::string& at) {
@@ -118,7 +119,8 @@ class Checker {
             {"arrayValue", one(&Checker::arrayValue)},
             {"kvlistValue", one(&Checker::kvlistValue)},
             {"bytesValue", one(&Checker::bytes)}});
-    if (json.is_object() && json.size() != 1) say(at, "is of " + std::to_string(json.size()) + " kinds");
+    if (json.is_object() && json.size() != 1)
+      addProblem(at, "is of " + std::to_string(json.size()) + " kinds");
   }
   void arrayValue(const Json& json, const std::string& at) {
     object(json, at, {{"values", listOf(&Checker::anyValue)}});
@@ -126,30 +128,31 @@ class Checker {
   void kvlistValue(const Json& json, const std::string& at) {
     object(json, at, {{"values", listOf(&Checker::innerKeyValue)}});
   }
-  // A client's nested map may have an empty key; nothing forbids it there.
+  // A client's nested map may have an empty key; the schema allows it there.
   void innerKeyValue(const Json& json, const std::string& at) {
     object(json, at, {{"key", one(&Checker::text)}, {"value", one(&Checker::anyValue)}});
     require(json, at, "value");
   }
 
   void text(const Json& json, const std::string& at) {
-    if (!json.is_string()) say(at, "is no text");
+    if (!json.is_string()) addProblem(at, "is no text");
   }
   void key(const Json& json, const std::string& at) {
-    if (!json.is_string() || json.get<std::string>().empty()) say(at, "is no key");
+    if (!json.is_string() || json.get<std::string>().empty()) addProblem(at, "is no key");
   }
   void boolean(const Json& json, const std::string& at) {
-    if (!json.is_boolean()) say(at, "is no boolean");
+    if (!json.is_boolean()) addProblem(at, "is no boolean");
   }
   void number(const Json& json, const std::string& at) {
     const bool isWord = json.is_string() && (json == "NaN" || json == "Infinity" || json == "-Infinity");
-    if (!json.is_number() && !isWord) say(at, "is no number");
+    if (!json.is_number() && !isWord) addProblem(at, "is no number");
   }
   void unsigned32(const Json& json, const std::string& at) {
-    if (!json.is_number_unsigned() || json.get<std::uint64_t>() > 0xFFFFFFFF) say(at, "is no 32-bit integer");
+    if (!json.is_number_unsigned() || json.get<std::uint64_t>() > 0xFFFFFFFF)
+      addProblem(at, "is no 32-bit integer");
   }
   void severity(const Json& json, const std::string& at) {
-    if (!json.is_number_unsigned() || json.get<std::uint64_t>() > 24) say(at, "is no severity");
+    if (!json.is_number_unsigned() || json.get<std::uint64_t>() > 24) addProblem(at, "is no severity");
   }
   void signed64(const Json& json, const std::string& at) {
     std::int64_t value = 0;
@@ -157,7 +160,7 @@ class Checker {
   }
   void time(const Json& json, const std::string& at) {
     std::uint64_t value = 0;
-    if (decimal(json, at, value) && value == 0) say(at, "is not set");
+    if (decimal(json, at, value) && value == 0) addProblem(at, "is not set");
   }
   template <typename T>
   bool decimal(const Json& json, const std::string& at, T& value) {
@@ -167,7 +170,7 @@ class Checker {
       const auto result = std::from_chars(digits.data(), end, value);
       if (!digits.empty() && result.ec == std::errc() && result.ptr == end) return true;
     }
-    say(at, "is no 64-bit integer as text");
+    addProblem(at, "is no 64-bit integer as text");
     return false;
   }
   Check hexOf(std::size_t digits) {
@@ -175,19 +178,19 @@ class Checker {
       const std::string hex = json.is_string() ? json.get<std::string>() : "?";
       if (!hex.empty() &&
           (hex.size() != digits || hex.find_first_not_of("0123456789abcdefABCDEF") != std::string::npos)) {
-        say(at, "is no identifier in hex");
+        addProblem(at, "is no identifier in hex");
       }
     };
   }
   void bytes(const Json& json, const std::string& at) {
     constexpr const char* kDigits = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789+/=";
     if (!json.is_string() || json.get<std::string>().find_first_not_of(kDigits) != std::string::npos) {
-      say(at, "is no base64");
+      addProblem(at, "is no base64");
     }
   }
 };
 
-// The document, and a problem for each key that an object has twice.
+// Parses the document, and adds a problem for each key that an object has twice.
 Json parse(std::string_view text, std::vector<std::string>& problems) {
   std::vector<std::set<std::string>> keys;
   return Json::parse(

@@ -7,11 +7,12 @@
 
 namespace tonewerk {
 
-// Holds the JSON of a logs export request to the whole of its schema: what a receiver that forgives nothing
-// would say about it, one text a problem with the place it was found at. Empty when nothing is wrong.
+// Checks the JSON of a logs export request against its whole schema, as the strictest receiver would. Returns
+// one text for each problem, with the place where it was found; empty when nothing is wrong.
 //
-// No unknown keys, none twice; 64-bit integers as decimal texts within their range, identifiers in hex, bytes
-// in base64; a value of exactly one kind; keys of attributes not empty and not twice; times that are set.
+// It requires: no unknown keys and no key twice; 64-bit integers as decimal texts within their range,
+// identifiers in hex, bytes in base64; a value of exactly one kind; attribute keys that are neither empty nor
+// repeated; times that are set.
 std::vector<std::string> problemsOfOtlpLogs(std::string_view json);
 
 }  // namespace tonewerk

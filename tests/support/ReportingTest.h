@@ -16,14 +16,14 @@
 
 namespace tonewerk {
 
-// A fresh daemon's inside on doubles: what every test of sessions, workers and the service starts from.
+// Makes the inside of a new daemon on doubles; the base of the tests of sessions, workers and the service.
 class ReportingTest : public ::testing::Test {
  protected:
   using Classes = std::vector<const TWReportingSessionWorkerClass*>;
 
   explicit ReportingTest(Classes workerClasses = {}) { useWorkers(std::move(workerClasses)); }
 
-  // Begins again with these worker classes. Before the first session.
+  // Starts again with these worker classes. Call before the first session.
   void useWorkers(Classes workerClasses) {
     context.reset();
     context.emplace(test.platform(), std::move(workerClasses));
@@ -36,7 +36,7 @@ class ReportingTest : public ::testing::Test {
     return std::make_shared<TWReportingSessionMessage>(std::move(payload), category, type);
   }
 
-  // A message of that time, kept as it is.
+  // Returns a message with that time, which the daemon keeps.
   static std::shared_ptr<TWReportingSessionMessage> messageAt(double time, ValueMap payload,
                                                               AudioEventCategory category = 4,
                                                               AudioEventType type = 0) {
@@ -52,7 +52,7 @@ class ReportingTest : public ::testing::Test {
   std::optional<TWReportingContext> context;
 };
 
-// The texts that `records` hold under `key`, in order.
+// Returns the texts that `records` hold under `key`, in order.
 inline std::vector<std::string> textsUnder(std::string_view key, const TWReportingSessionMessages& records) {
   std::vector<std::string> texts;
   for (const auto& record : records) texts.push_back(textOf(record->message.find(key)));

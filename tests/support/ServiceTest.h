@@ -14,7 +14,8 @@
 
 namespace tonewerk {
 
-// A service on doubles, with clients that connect in memory. Nothing runs on the work queue until run().
+// Makes a service on doubles, with clients that connect in memory. Nothing runs on the work queue until
+// run().
 class ServiceTest : public ReportingTest {
  public:
   ~ServiceTest() override {
@@ -38,7 +39,7 @@ class ServiceTest : public ReportingTest {
   }
   void run() { test.queues.runAll(); }
 
-  // Sends a request and lets it run; its answers, in order.
+  // Sends a request and runs the work queue. Returns the request's answers in order.
   std::vector<MemoryResponse> ask(MemoryClient& client, std::string_view method, Arguments arguments) {
     const auto identifier = client.request(method, std::move(arguments));
     run();
@@ -48,7 +49,7 @@ class ServiceTest : public ReportingTest {
     return answers;
   }
 
-  // The one answer.
+  // Returns the result of a request that must have exactly one answer.
   Value askOnce(MemoryClient& client, std::string_view method, Arguments arguments) {
     const auto answers = ask(client, method, std::move(arguments));
     EXPECT_EQ(answers.size(), 1U);
@@ -64,7 +65,7 @@ class ServiceTest : public ReportingTest {
     ask(client, "startReportingSessionForID", {reporterID});
   }
 
-  // The session of the client at that place.
+  // Returns the session of the client with that index; null when there is none.
   std::shared_ptr<TWReportingSession> sessionOf(std::size_t client, ReporterID reporterID) {
     const auto& sessions = service->getAllClients().at(client)->clientReportingSessionMap();
     const auto found = sessions.find(reporterID);

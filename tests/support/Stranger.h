@@ -10,17 +10,17 @@
 
 namespace tonewerk {
 
-// A user who is neither root nor, where tests run as root, the one that they run as: nobody.
+// A user that is neither root nor the user that tests run as: nobody.
 inline constexpr std::uint32_t kStranger = 65'534;
 
-// Runs `work` as that user, on a thread of its own, and returns when it has run. For root only.
+// Runs `work` as that user, on a thread of its own, and returns when it has run. Only root can call it.
 inline void runAsStranger(const std::function<void()>& work) {
-  std::thread stranger([&work] {
-    // The system call itself changes this thread alone; the library's function would change them all.
+  std::thread otherUser([&work] {
+    // The system call changes only this thread; the library's function would change all threads.
     ASSERT_EQ(::syscall(SYS_setresuid, -1, kStranger, -1), 0);
     work();
   });
-  stranger.join();
+  otherUser.join();
 }
 
 }  // namespace tonewerk

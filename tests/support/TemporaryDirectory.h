@@ -7,7 +7,7 @@
 
 namespace tonewerk {
 
-// An empty directory of the test's own, removed with all that is in it.
+// Makes an empty directory for the test and removes it with its contents.
 class TemporaryDirectory {
  public:
   TemporaryDirectory() {
@@ -21,7 +21,7 @@ class TemporaryDirectory {
     if (!path_.empty()) std::filesystem::remove_all(path_, error);
   }
 
-  // Empty when it could not be made.
+  // Returns an empty text when the directory could not be made.
   const std::string& path() const { return path_; }
   std::string path(const std::string& name) const { return path_ + "/" + name; }
 

@@ -31,14 +31,14 @@
 
 namespace tonewerk {
 
-// The operating system in memory: one of each double, and the Platform made of them.
+// Replaces the operating system in memory: it holds one of each double and makes a Platform of them.
 //
 //   TestPlatform test;
 //   TWReportingService service(test.platform());
 //   test.clock.advance(5.0);
 //   test.queues.runAll();
 //
-// Declare it before what uses it, so that it dies last.
+// Declare it before its users, so that it is destroyed last.
 struct TestPlatform {
   TestPlatform() = default;
   TestPlatform(const TestPlatform&) = delete;
@@ -46,12 +46,12 @@ struct TestPlatform {
 
   Platform platform() { return platformWith(capsa); }
 
-  // The same with another capture service.
+  // Returns a Platform with another capture service.
   Platform platformWith(Capsa& otherCapsa) {
     return platformWith(log, tracePoints, clock, queues, metricon, linkReport, otherCapsa);
   }
 
-  // The same with other services in place of those that messages use, for benchmarks.
+  // Returns a Platform with other services in place of those that messages use, for benchmarks.
   Platform platformWith(Log& otherLog, TracePoints& otherTracePoints, Clock& otherClock,
                         SerialQueueFactory& otherQueues, Metricon& otherMetricon,
                         LinkReport& otherLinkReport) {

@@ -12,13 +12,13 @@ namespace {
 
 TestWorkerJournal* currentJournal = nullptr;
 
-void note(std::string_view name, const std::string& what) {
+void record(std::string_view name, const std::string& what) {
   if (TestWorkerJournal* journal = TestWorkerJournal::current()) journal->add(std::string(name) + " " + what);
 }
 
 enum : unsigned { kSingle = 1, kOnInit = 2, kRedundant = 4 };
 
-// A fixed text as a template argument: each name makes a class of its own.
+// A fixed text as a template argument: each name makes its own class.
 template <std::size_t N>
 struct Name {
   constexpr Name(const char (&text)[N]) { std::copy_n(text, N, characters); }  // NOLINT: implicit by purpose
@@ -36,10 +36,10 @@ std::shared_ptr<Worker> makeUnlessFailing(std::string_view name,
   return worker;
 }
 
-std::optional<bool> startNoted(std::string_view name) {
+std::optional<bool> recordStart(std::string_view name) {
   const TestWorkerJournal* journal = TestWorkerJournal::current();
   const bool fails = journal != nullptr && journal->startFails(name);
-  note(name, fails ? "failed to start" : "started");
+  record(name, fails ? "failed to start" : "started");
   return !fails;
 }
 
@@ -52,10 +52,10 @@ class PlainWorker final : public TWReportingSessionWorkerProtocol {
     return makeUnlessFailing<PlainWorker>(kName.view(), session);
   }
   std::optional<bool> start() override {
-    note(kName.view(), "started");
+    record(kName.view(), "started");
     return std::nullopt;
   }
-  void stop() override { note(kName.view(), "stopped"); }
+  void stop() override { record(kName.view(), "stopped"); }
 };
 template <Name kName>
 const TWReportingSessionWorkerClass PlainWorker<kName>::kWorkerClass =
@@ -70,8 +70,8 @@ class ProducingWorker final : public TWReportingSessionWorkerProducerProtocol {
       const std::shared_ptr<TWReportingSession>& session) {
     return makeUnlessFailing<ProducingWorker>(kName.view(), session);
   }
-  std::optional<bool> start() override { return startNoted(kName.view()); }
-  void stop() override { note(kName.view(), "stopped"); }
+  std::optional<bool> start() override { return recordStart(kName.view()); }
+  void stop() override { record(kName.view(), "stopped"); }
 };
 template <Name kName>
 const TWReportingSessionWorkerClass ProducingWorker<kName>::kWorkerClass =
@@ -90,12 +90,12 @@ class ConsumingWorker final : public Producer, public TWReportingSessionWorkerCo
       const std::shared_ptr<TWReportingSession>& session) {
     return makeUnlessFailing<ConsumingWorker>(kName.view(), session);
   }
-  std::optional<bool> start() override { return startNoted(kName.view()); }
-  void stop() override { note(kName.view(), "stopped"); }
+  std::optional<bool> start() override { return recordStart(kName.view()); }
+  void stop() override { record(kName.view(), "stopped"); }
   bool handleRedundantMessages() const override { return (kAnswers & kRedundant) != 0; }
   bool handleMessage(const TWReportingSessionMessage& message) override {
-    note(kName.view(),
-         "got a=" + textOf(message.message.find("a")) + (message.isRedundant ? " redundant" : ""));
+    record(kName.view(),
+           "got a=" + textOf(message.message.find("a")) + (message.isRedundant ? " redundant" : ""));
     return false;
   }
 };

@@ -11,9 +11,9 @@
 
 namespace tonewerk {
 
-// What test workers do, in order, as "Volume started", "Capsa failed to start", "Rtc got a=1", "Rtc got a=1
-// redundant", "Rtc stopped"; and how a test makes them do otherwise. One may live at a time; without one
-// workers do nothing.
+// Records what test workers do, in order, such as "Volume started", "Capsa failed to start", "Rtc got a=1",
+// "Rtc got a=1 redundant" or "Rtc stopped", and lets a test change what they do. At most one may exist at a
+// time; without one, workers record nothing.
 class TestWorkerJournal {
  public:
   TestWorkerJournal();
@@ -21,14 +21,14 @@ class TestWorkerJournal {
   TestWorkerJournal& operator=(const TestWorkerJournal&) = delete;
   ~TestWorkerJournal();
 
-  // What happened since the last call.
+  // Returns the events since the last call.
   std::vector<std::string> take();
   // Runs `action` once, when `event` happens.
   void onEvent(const std::string& event, std::function<void()> action);
   void failStart(std::string_view workerName) { failingStart_ = workerName; }
   void failToMake(std::string_view workerName) { failingToMake_ = workerName; }
 
-  // For the workers. Null without a journal.
+  // For the workers. Returns null without a journal.
   static TestWorkerJournal* current();
   void add(const std::string& event);
   bool startFails(std::string_view workerName) const { return failingStart_ == workerName; }
@@ -41,9 +41,9 @@ class TestWorkerJournal {
   std::string failingToMake_;
 };
 
-// Sixteen classes with the roles and answers of the daemon's workers, in their order: Trace, Volume, Gather,
-// Summary, Input, Metricon, Energybook, MemoryLog, Diagwire, DriverSnapshot, SystemMonitor, Capsa, DP,
-// JsonFile, Rtc, IssueDraft.
+// Returns sixteen classes with the roles and answers of the daemon's workers, in their order: Trace, Volume,
+// Gather, Summary, Input, Metricon, Energybook, MemoryLog, Diagwire, DriverSnapshot, SystemMonitor, Capsa,
+// DP, JsonFile, Rtc, IssueDraft.
 std::vector<const TWReportingSessionWorkerClass*> testWorkerClasses();
 std::vector<const TWReportingSessionWorkerClass*> testWorkerClassesWithoutStartOnInit();
 const TWReportingSessionWorkerClass* testWorkerClass(std::string_view name);

@@ -9,8 +9,8 @@
 
 namespace tonewerk {
 
-// Makes a user's tests with a real tracer wait for one another, whatever program they are in: each user's
-// session daemon is one for the whole machine.
+// Makes the tests of one user that use a real tracer run one after the other, also in different programs:
+// each user has one session daemon for the whole machine.
 class TracingTurn {
  public:
   TracingTurn() { EXPECT_EQ(::flock(file_, LOCK_EX), 0); }

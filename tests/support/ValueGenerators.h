@@ -13,15 +13,15 @@
 
 namespace tonewerk {
 
-// For messages of failed tests.
+// Let rapidcheck print values in messages of failed tests.
 inline void showValue(const Value& value, std::ostream& out) {
   out << value.text() << " (kind " << static_cast<int>(value.kind()) << ")";
 }
 inline void showValue(const ValueMap& map, std::ostream& out) { out << map.text(); }
 
-// Arbitrary values for property-based tests, with a liking for the edges: 2^53 and 2^63, NaN and the
-// infinities, empty and control-character texts, dates far away, nested maps and maps large enough for an
-// index.
+// Generate arbitrary values for property-based tests, with many edge cases: 2^53 and 2^63, NaN and the
+// infinities, empty texts and texts with control characters, dates far away, nested maps, and maps large
+// enough for an index.
 //
 //   RC_GTEST_PROP(ValueTest, EqualsItself, ()) {
 //     const Value value = *generate::value();
@@ -93,7 +93,7 @@ inline rc::Gen<double> number() {
                             std::numeric_limits<double>::quiet_NaN())}});
 }
 
-// Of the years 0 to 9999, to the microsecond.
+// Generates dates of the years 0 to 9999, to the microsecond.
 inline rc::Gen<Date> date() {
   return rc::gen::apply(
       [](std::int64_t seconds, int micros) {
@@ -112,7 +112,7 @@ inline rc::Gen<Value> scalar() {
                         rc::gen::map(text(), asValue), rc::gen::map(date(), asValue));
 }
 
-// Few keys that come often, so that maps meet, and arbitrary ones.
+// Generates arbitrary keys, and a few keys often, so that maps have keys in common.
 inline rc::Gen<std::string> key() {
   return rc::gen::oneOf(
       rc::gen::element<std::string>("a", "b", "c", "", "level", "reporterID"),

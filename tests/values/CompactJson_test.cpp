@@ -20,7 +20,7 @@ std::string compact(const Value& value) {
   return out;
 }
 
-// Whether a JSON parser that is not ours read what `value` holds, forms of numbers included.
+// Returns whether an independent JSON parser reads what `value` holds, including the forms of numbers.
 bool says(const Json& json, const Value& value) {
   switch (value.kind()) {
     case Value::Kind::kBoolean:
@@ -63,14 +63,14 @@ RC_GTEST_PROP(CompactJsonTest, SaysTheSameToAnyParserInTheSameOrder, ()) {
   RC_ASSERT(says(parsed, value));
 }
 
-TEST(CompactJsonTest, EscapesWhatJsonWants) {
+TEST(CompactJsonTest, EscapesWhatJsonRequires) {
   EXPECT_EQ(compact("\"\\/\b\f\n\r\t\x01\x1f\x7f"), "\"\\\"\\\\/\\b\\f\\n\\r\\t\\u0001\\u001f\x7f\"");
   EXPECT_EQ(compact(std::string_view("a\0b", 3)), R"("a\u0000b")");
   EXPECT_EQ(compact("\xC3\xA4"), "\"\xC3\xA4\"");
 }
 
-// Most of a text is looked at eight characters at a time.
-TEST(CompactJsonTest, EscapesWhereverInATextItStands) {
+// appendCompactJson() checks most of a text eight characters at a time.
+TEST(CompactJsonTest, EscapesACharacterAtAnyPlaceInAText) {
   for (std::size_t at = 0; at < 24; ++at) {
     for (const char* character : {"\"", "\\", "\x1f"}) {
       const std::string plain(23, 'x');
@@ -97,7 +97,7 @@ TEST(CompactJsonTest, ADoubleReadsBackAsADouble) {
   EXPECT_EQ(compact(0.5), "0.5");
 }
 
-TEST(CompactJsonTest, WhatJsonLacksIsNull) {
+TEST(CompactJsonTest, NumbersThatJsonCannotExpressAreNull) {
   EXPECT_EQ(compact(std::numeric_limits<double>::quiet_NaN()), "null");
   EXPECT_EQ(compact(-std::numeric_limits<double>::infinity()), "null");
 }

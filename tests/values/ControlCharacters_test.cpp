@@ -13,7 +13,7 @@ TEST(ControlCharactersTest, AreReplacedByteForByte) {
   EXPECT_EQ(withoutControlCharacters(std::string("\0", 1)), "?");
 }
 
-TEST(ControlCharactersTest, GoWithEverythingBeyondAsciiWhereNothingElseIsPrintable) {
+TEST(ControlCharactersTest, AreReplacedTogetherWithAllBytesBeyondAscii) {
   EXPECT_EQ(printableAscii("a b~\n\x7F\xC3\xBC\xFF"), "a b~?????");
 }
 

@@ -13,12 +13,12 @@ TEST(GrowingDelayTest, DoublesUpToItsLimit) {
   for (const int expected : {250, 500, 900, 900}) EXPECT_EQ(delay.next(), milliseconds(expected));
 }
 
-TEST(GrowingDelayTest, GrowsByAnotherFactorWhereOneIsGiven) {
+TEST(GrowingDelayTest, GrowsByTheGivenFactor) {
   GrowingDelay delay(milliseconds(200), milliseconds(400), 1.5);
   for (const int expected : {200, 300, 400, 400}) EXPECT_EQ(delay.next(), milliseconds(expected));
 }
 
-TEST(GrowingDelayTest, BeginsAnewAfterASuccess) {
+TEST(GrowingDelayTest, StartsAgainAfterASuccess) {
   GrowingDelay delay(milliseconds(250), milliseconds(4000));
   delay.next();
   delay.next();

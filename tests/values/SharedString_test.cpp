@@ -15,7 +15,7 @@ TEST(SharedStringTest, ACopySharesTheCharacters) {
   EXPECT_EQ(copy.view().data(), text.view().data());
 }
 
-TEST(SharedStringTest, WhatWasMovedFromIsEmpty) {
+TEST(SharedStringTest, ATextThatWasMovedFromIsEmpty) {
   SharedString text("level");
   const SharedString taken = std::move(text);
   EXPECT_TRUE(text.empty());  // NOLINT(bugprone-use-after-move)

@@ -18,14 +18,14 @@ struct Case {
 
 class Utf8Test : public testing::TestWithParam<Case> {};
 
-TEST_P(Utf8Test, TellsTextFromOtherBytes) {
+TEST_P(Utf8Test, DistinguishesTextFromOtherBytes) {
   const std::string bytes = fromHex(GetParam().hex);
   EXPECT_EQ(isUtf8(bytes), GetParam().isText);
   EXPECT_EQ(isUtf8("eight ascii bytes and more " + bytes), GetParam().isText);
   EXPECT_EQ(isUtf8(bytes + " and more than eight ascii bytes"), GetParam().isText);
 }
 
-// As Unicode recommends: one U+FFFD for the longest beginning of a character, else for a byte.
+// Unicode recommends one U+FFFD for the longest beginning of a character, else one for each byte.
 struct Repaired {
   const char* name;
   const char* hex;
@@ -34,7 +34,7 @@ struct Repaired {
 
 class RepairedTextTest : public testing::TestWithParam<Repaired> {};
 
-TEST_P(RepairedTextTest, HasTheReplacementForWhatIsNoText) {
+TEST_P(RepairedTextTest, ReplacesEverythingThatIsNotText) {
   const std::string bytes = fromHex(GetParam().hex);
   const std::string text = GetParam().text;
   EXPECT_EQ(validUtf8(bytes), text);
@@ -67,7 +67,7 @@ INSTANTIATE_TEST_SUITE_P(All, RepairedTextTest,
                                          Repaired{"NoSuchByte", "FE FF", "\uFFFD\uFFFD"}),
                          [](const auto& tested) { return tested.param.name; });
 
-TEST(Utf8CharacterLengthTest, IsThatOfTheFirstCharacterAlone) {
+TEST(Utf8CharacterLengthTest, MeasuresOnlyTheFirstCharacter) {
   EXPECT_EQ(utf8CharacterLength("a\xFF"), 1U);
   EXPECT_EQ(utf8CharacterLength("\u20AC\xFF"), 3U);
   EXPECT_EQ(utf8CharacterLength("\xC3"), 0U);
@@ -103,7 +103,7 @@ std::string encoded(std::uint32_t character) {
 TEST(TextTest, IsEveryCharacterButTheNoncharacters) {
   int refused = 0;
   for (std::uint32_t character = 0; character < 0x110000; ++character) {
-    if (character == 0xD800) character = 0xE000;  // past the surrogates
+    if (character == 0xD800) character = 0xE000;  // skip the surrogates
     const bool isNoncharacter =
         (character & 0xFFFEU) == 0xFFFEU || (character >= 0xFDD0 && character <= 0xFDEF);
     const std::string bytes = encoded(character);

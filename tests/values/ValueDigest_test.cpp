@@ -17,7 +17,7 @@ namespace {
 
 ValueDigest digestOf(const Value& value) { return ValueDigest::of({{"v", value}}); }
 
-TEST(ValueDigestTest, NumbersThatAreEqualInOtherFormsHaveOneDigest) {
+TEST(ValueDigestTest, EqualNumbersOfDifferentFormsHaveOneDigest) {
   EXPECT_EQ(digestOf(1), digestOf(true));
   EXPECT_EQ(digestOf(1), digestOf(1.0));
   EXPECT_EQ(digestOf(1), digestOf(std::uint64_t{1}));
@@ -28,7 +28,7 @@ TEST(ValueDigestTest, NumbersThatAreEqualInOtherFormsHaveOneDigest) {
   EXPECT_EQ(digestOf(Date{0.0}), digestOf(Date{-0.0}));
 }
 
-TEST(ValueDigestTest, WhatOnlyLooksAlikeHasAnotherDigest) {
+TEST(ValueDigestTest, SimilarValuesThatDifferHaveDifferentDigests) {
   const std::vector<Value> all{0,
                                1,
                                -1,
@@ -57,7 +57,7 @@ TEST(ValueDigestTest, WhatOnlyLooksAlikeHasAnotherDigest) {
   }
 }
 
-TEST(ValueDigestTest, AMapsOrderDoesNotMatterAnArraysDoes) {
+TEST(ValueDigestTest, OrderMattersInAnArrayButNotInAMap) {
   EXPECT_EQ(ValueDigest::of({{"a", 1}, {"b", 2}}), ValueDigest::of({{"b", 2}, {"a", 1}}));
   EXPECT_NE(ValueDigest::of({{"a", 1}, {"b", 2}}), ValueDigest::of({{"a", 2}, {"b", 1}}));
   EXPECT_NE(digestOf(ValueArray({1, 2})), digestOf(ValueArray({2, 1})));

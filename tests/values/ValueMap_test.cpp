@@ -13,7 +13,7 @@
 namespace tonewerk {
 namespace {
 
-// What a map ought to be: a list of keys and values, searched from its beginning.
+// A model of a map: a list of keys and values that is searched from its beginning.
 class ModelMap {
  public:
   void set(const std::string& key, const Value& value) {
@@ -131,7 +131,7 @@ TEST(ValueMapTest, AMergedTextReplacesAnEqualOneAndAnother) {
   EXPECT_EQ(map.bytes(), bytes);
 }
 
-TEST(ValueMapTest, OfAKeyGivenTwiceTheLastValueWins) {
+TEST(ValueMapTest, TheLastValueOfARepeatedKeyWins) {
   EXPECT_EQ((ValueMap{{"a", 1}, {"b", 2}, {"a", 3}}).text(), R"({"a":3,"b":2})");
 }
 
@@ -196,7 +196,7 @@ TEST(ValueMapTest, FindsEveryKeyOfALargeMap) {
   EXPECT_FALSE(map.contains("key5000"));
 }
 
-TEST(ValueMapTest, AnAbsentKeyReadsAsNothing) {
+TEST(ValueMapTest, AnAbsentKeyReadsAsZeroFalseOrEmpty) {
   const ValueMap map;
   EXPECT_EQ(map.find("a"), nullptr);
   EXPECT_FALSE(map.boolean("a"));

@@ -17,7 +17,7 @@ constexpr std::int64_t kMax = std::numeric_limits<std::int64_t>::max();
 constexpr std::int64_t kLeast = std::numeric_limits<std::int64_t>::min();
 constexpr std::int64_t kTwoTo53 = std::int64_t{1} << 53;
 
-// A value of another form that may be equal to `value`: the same number, another order of keys.
+// Returns a value of another form that may be equal to `value`: the same number, or another order of keys.
 Value inAnotherForm(const Value& value) {
   if (value.asBoolean() != nullptr) return Value(value.integer());
   if (value.asInteger() != nullptr) return Value(value.number());
@@ -62,7 +62,7 @@ RC_GTEST_PROP(ValueEqualityTest, IsTransitive, ()) {
 RC_GTEST_PROP(ValueEqualityTest, AnIntegerEqualsADoubleOnlyWhenTheDoubleIsExactlyIt, ()) {
   const std::int64_t integer = *generate::integer();
   const auto rounded = static_cast<double>(integer);
-  // Exactly: the double, as a long double with 64 digits, is the integer.
+  // A long double has 64 binary digits and so holds both numbers exactly.
   const bool exact = static_cast<long double>(rounded) == static_cast<long double>(integer);
   RC_ASSERT((Value(integer) == Value(rounded)) == exact);
 }
@@ -102,7 +102,7 @@ TEST(ValueEqualityTest, IsExactWhereDoublesAreNot) {
   EXPECT_FALSE(Value(-1) == Value(std::numeric_limits<std::uint64_t>::max()));
 }
 
-TEST(ValueEqualityTest, KindsThatAreNoNumbersAreEqualToTheirOwnOnly) {
+TEST(ValueEqualityTest, OtherKindsAreEqualOnlyToTheirOwnKind) {
   EXPECT_FALSE(Value("1") == Value(1));
   EXPECT_FALSE(Value(ValueArray()) == Value(ValueMap()));
   EXPECT_FALSE(Value("") == Value(false));
@@ -177,11 +177,11 @@ TEST(ValueConversionTest, ThirtyTwoBitReadingsKeepTheLowBits) {
   EXPECT_EQ(Value(0xFFFF'FFFF).integer32(), -1);
   EXPECT_EQ(Value(0x8000'0000).integer32(), std::numeric_limits<std::int32_t>::min());
   EXPECT_EQ(Value(kLeast).integer32(), 0);
-  EXPECT_EQ(Value((std::uint64_t{1} << 63U) + 5).integer32(), 5);  // beyond what integer() can say
+  EXPECT_EQ(Value((std::uint64_t{1} << 63U) + 5).integer32(), 5);  // beyond the range of integer()
   EXPECT_EQ(Value(std::numeric_limits<std::uint64_t>::max()).integer32(), -1);
 }
 
-TEST(ValueConversionTest, AnAbsentValueReadsAsNothing) {
+TEST(ValueConversionTest, AnAbsentValueReadsAsZeroFalseOrEmpty) {
   EXPECT_FALSE(booleanOf(nullptr));
   EXPECT_EQ(integerOf(nullptr), 0);
   EXPECT_EQ(numberOf(nullptr), 0.0);
@@ -193,7 +193,7 @@ RC_GTEST_PROP(ValueConversionTest, AnIntegersTextReadsAsTheInteger, ()) {
   RC_ASSERT(Value(Value(integer).text()).integer() == integer);
 }
 
-TEST(ValueTextTest, IsWhatPeopleExpect) {
+TEST(ValueTextTest, IsWhatPercentAtPrints) {
   EXPECT_EQ(Value(true).text(), "1");
   EXPECT_EQ(Value(false).text(), "0");
   EXPECT_EQ(Value(-12).text(), "-12");
@@ -216,7 +216,7 @@ TEST(DoubleTextTest, UsesFixedNotationFromOneTenThousandthToTenQuadrillions) {
   EXPECT_EQ(textOf(5e-324), "5e-324");
 }
 
-TEST(DoubleTextTest, SaysWhatIsNoOrdinaryNumber) {
+TEST(DoubleTextTest, WritesInfinitiesNanAndNegativeZero) {
   EXPECT_EQ(textOf(kNaN), "nan");
   EXPECT_EQ(textOf(-kNaN), "nan");
   EXPECT_EQ(textOf(kInfinity), "inf");

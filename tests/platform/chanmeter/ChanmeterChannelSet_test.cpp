@@ -47,7 +47,7 @@ TEST_F(ChanmeterChannelSetTest, GroupAndSubGroupMustBothMatch) {
   EXPECT_THAT(namesOf(chanmeterRecordsIn(records, "Tx", "MCA")), IsEmpty());
 }
 
-TEST_F(ChanmeterChannelSetTest, AnEmptyNameIsANameAndNotNone) {
+TEST_F(ChanmeterChannelSetTest, AnEmptyNameIsNotAnAbsentName) {
   EXPECT_THAT(namesOf(chanmeterRecordsIn(records, "", {})), ElementsAre("e"));
   EXPECT_THAT(namesOf(chanmeterRecordsIn(records, {}, "")), ElementsAre("e"));
 }
@@ -63,14 +63,14 @@ TEST_F(ChanmeterChannelSetTest, HoldsEachChannelOnce) {
   EXPECT_EQ(ChanmeterChannelSet(twice).keys().size(), records.size());
 }
 
-TEST_F(ChanmeterChannelSetTest, SelectsItsOwnInTheRecordsOrder) {
+TEST_F(ChanmeterChannelSetTest, SelectsItsChannelsInTheOrderOfTheRecords) {
   const ChanmeterChannelSet set({records[2]->key, records[0]->key});
   EXPECT_TRUE(set.contains(records[0]->key));
   EXPECT_FALSE(set.contains(records[1]->key));
   EXPECT_THAT(namesOf(set.selectedFrom(records)), ElementsAre("a", "c"));
 }
 
-TEST_F(ChanmeterChannelSetTest, ContainsItsOwnAlsoInSeveralGroupsAndInNone) {
+TEST_F(ChanmeterChannelSetTest, ContainsItsChannelsInSeveralGroupsAndInNone) {
   const ChanmeterChannelSet set({records[4]->key, records[3]->key, records[2]->key, records[0]->key});
   std::vector<std::string> contained;
   for (const auto& one : records) {

@@ -10,7 +10,7 @@
 #include "support/ChannelRecords.h"
 #include "support/ValueGenerators.h"
 
-// What a difference must be for any records, and what it is by the slowest way there is.
+// Tests properties of the difference of any records, and compares it with a slow and simple computation.
 
 namespace tonewerk {
 namespace {
@@ -21,7 +21,7 @@ std::uint64_t sinceStart(std::uint64_t later, std::uint64_t earlier) {
   return later < earlier ? later : later - earlier;
 }
 
-// Hits in the generated records are not negative, and their changes fit.
+// Hits in the generated records are not negative, and their differences do not overflow.
 std::int64_t hitsSinceStart(std::int64_t later, std::int64_t earlier) {
   return later < earlier ? later : later - earlier;
 }
@@ -65,7 +65,7 @@ std::vector<ChanmeterRecord> anyRecords() {
   return *rc::gen::container<std::vector<ChanmeterRecord>>(record());
 }
 
-// The later records' counterparts by trying all, each taken once.
+// Finds the later records' counterparts by comparing all pairs, and uses each earlier record once.
 template <typename T, typename Same>
 std::vector<const T*> slowCounterparts(const std::vector<T>& earlier, const std::vector<T>& later,
                                        const Same& same) {
@@ -163,7 +163,7 @@ RC_GTEST_PROP(ChanmeterDifferenceProperties, OfRecordsWithThemselvesIsZeroEveryw
 }
 
 RC_GTEST_PROP(ChanmeterDifferenceProperties, DoesNotDependOnTheEarlierOrder, ()) {
-  // Of channels of one name the order does count.
+  // For channels with one name the order matters.
   const std::vector<ChanmeterRecord> earlier = *rc::gen::uniqueBy<std::vector<ChanmeterRecord>>(
       record(), [](const ChanmeterRecord& one) { return std::make_pair(one.key, one.format); });
   const ChanmeterRecords later = shared(anyRecords());

@@ -48,7 +48,7 @@ TEST(ChanmeterDifferenceTest, SimpleValuesSubtract) {
   EXPECT_EQ(simpleDifference(-5, 5), 10);
 }
 
-TEST(ChanmeterDifferenceTest, AChangeThatDoesNotFitIsTheNearestThatDoes) {
+TEST(ChanmeterDifferenceTest, AChangeThatDoesNotFitSaturates) {
   EXPECT_EQ(simpleDifference(kLeast, kMax), kMax);
   EXPECT_EQ(simpleDifference(-1, kMax), kMax);
   EXPECT_EQ(simpleDifference(0, kMax), kMax);
@@ -131,7 +131,7 @@ TEST(ChanmeterDifferenceTest, ChannelsComeInTheLaterOrder) {
               ElementsAre(simple(speaker("c"), 3), simple(speaker("a"), 1), simple(speaker("b"), 2)));
 }
 
-TEST(ChanmeterDifferenceTest, EachPartOfAKeyTellsChannelsApart) {
+TEST(ChanmeterDifferenceTest, EachPartOfAKeyDistinguishesChannels) {
   const ChanmeterKey key{.driver = "d", .group = "g", .subGroup = "s", .name = "n"};
   for (const auto part :
        {&ChanmeterKey::driver, &ChanmeterKey::group, &ChanmeterKey::subGroup, &ChanmeterKey::name}) {
@@ -143,23 +143,23 @@ TEST(ChanmeterDifferenceTest, EachPartOfAKeyTellsChannelsApart) {
   }
 }
 
-TEST(ChanmeterDifferenceTest, AChannelWhoseFormatChangedIsANewOne) {
+TEST(ChanmeterDifferenceTest, AChannelWhoseFormatChangedCountsAsNew) {
   EXPECT_THAT(difference({simple(speaker("a"), 1)}, {histogram(speaker("a"), {{0, 1, 5}})}), IsEmpty());
 }
 
-TEST(ChanmeterDifferenceTest, AChannelOfAFormatWithoutValuesStays) {
+TEST(ChanmeterDifferenceTest, AChannelOfAFormatWithoutValuesGivesItself) {
   const std::vector<ChanmeterRecord> records = {ofFormat(speaker("a"), 0), ofFormat(speaker("b"), 4),
                                                 ofFormat(speaker("c"), 7)};
   EXPECT_EQ(difference(records, records), records);
 }
 
-TEST(ChanmeterDifferenceTest, OfChannelsOfOneNameTheNthGoesWithTheNth) {
+TEST(ChanmeterDifferenceTest, RepeatedChannelsMatchInOrder) {
   EXPECT_THAT(difference({simple(speaker("b"), 0), simple(speaker("a"), 1), simple(speaker("a"), 10)},
                          {simple(speaker("a"), 3), simple(speaker("a"), 15), simple(speaker("a"), 99)}),
               ElementsAre(simple(speaker("a"), 2), simple(speaker("a"), 5)));
 }
 
-TEST(ChanmeterDifferenceTest, OfNothingIsNothing) {
+TEST(ChanmeterDifferenceTest, NoRecordsGiveNoDifference) {
   EXPECT_THAT(difference({}, {}), IsEmpty());
   EXPECT_THAT(difference({simple(speaker("a"), 1)}, {}), IsEmpty());
   EXPECT_THAT(difference({}, {simple(speaker("a"), 1)}), IsEmpty());

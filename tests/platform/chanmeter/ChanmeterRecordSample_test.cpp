@@ -11,7 +11,7 @@ ChanmeterRecordSample sampleOf(ChanmeterRecord record) {
   return ChanmeterRecordSample(std::make_shared<const ChanmeterRecord>(std::move(record)));
 }
 
-// Has values of every kind, so that the format alone decides which are seen.
+// Returns a record with values of every kind, so that only the format decides which are visible.
 ChanmeterRecord fullRecord(ChanmeterFormat format) {
   return {.key = {.driver = "Amp Drv<0x1>", .group = "Speaker", .subGroup = "Queue", .name = "Rail Volts"},
           .unit = "mV",
@@ -33,7 +33,7 @@ TEST(ChanmeterRecordSampleTest, GivesNamesAndUnit) {
   EXPECT_EQ(sample.unitLabel(), "mV");
 }
 
-TEST(ChanmeterRecordSampleTest, WhatARecordLacksIsAbsentAndNotEmpty) {
+TEST(ChanmeterRecordSampleTest, MissingTextsAreAbsentAndNotEmpty) {
   const ChanmeterRecordSample sample = sampleOf({});
   EXPECT_EQ(sample.format(), kChanmeterFormatInvalid);
   EXPECT_EQ(sample.driverName(), std::nullopt);
@@ -43,7 +43,7 @@ TEST(ChanmeterRecordSampleTest, WhatARecordLacksIsAbsentAndNotEmpty) {
   EXPECT_EQ(sample.unitLabel(), std::nullopt);
 }
 
-TEST(ChanmeterRecordSampleTest, ASimpleSampleHasItsValueAlone) {
+TEST(ChanmeterRecordSampleTest, ASimpleSampleHasOnlyItsValue) {
   const ChanmeterRecordSample sample = sampleOf(fullRecord(kChanmeterFormatSimple));
   EXPECT_EQ(sample.simpleIntegerValue(), 12);
   EXPECT_EQ(sample.stateCount(), 0);
@@ -57,7 +57,7 @@ TEST(ChanmeterRecordSampleTest, ASimpleSampleHasItsValueAlone) {
   EXPECT_EQ(sample.histogramMaxValue(), 0);
 }
 
-TEST(ChanmeterRecordSampleTest, AStateSampleHasItsStatesAlone) {
+TEST(ChanmeterRecordSampleTest, AStateSampleHasOnlyItsStates) {
   const ChanmeterRecordSample sample = sampleOf(fullRecord(kChanmeterFormatState));
   EXPECT_EQ(sample.stateCount(), 1);
   EXPECT_EQ(sample.stateName(0), "on");
@@ -68,7 +68,7 @@ TEST(ChanmeterRecordSampleTest, AStateSampleHasItsStatesAlone) {
   EXPECT_EQ(sample.histogramBucketCount(), 0);
 }
 
-TEST(ChanmeterRecordSampleTest, AHistogramSampleHasItsBucketsAlone) {
+TEST(ChanmeterRecordSampleTest, AHistogramSampleHasOnlyItsBuckets) {
   const ChanmeterRecordSample sample = sampleOf(fullRecord(kChanmeterFormatHistogram));
   EXPECT_EQ(sample.histogramBucketCount(), 1);
   EXPECT_EQ(sample.histogramBucketHits(0), 5);
@@ -83,7 +83,7 @@ TEST(ChanmeterRecordSampleTest, AHistogramSampleHasItsBucketsAlone) {
   EXPECT_EQ(sample.stateCount(), 0);
 }
 
-TEST(ChanmeterRecordSampleTest, AFormatNotKnownHasNoValues) {
+TEST(ChanmeterRecordSampleTest, AnUnknownFormatHasNoValues) {
   const ChanmeterRecordSample sample = sampleOf(fullRecord(7));
   EXPECT_EQ(sample.format(), 7);
   EXPECT_EQ(sample.simpleIntegerValue(), 0);
@@ -106,7 +106,7 @@ TEST(ChanmeterRecordSampleTest, IndexesOutOfRangeAreZeroAndEmpty) {
   }
 }
 
-TEST(ChanmeterRecordSampleTest, ABucketWithoutOneOfItsBoundsLeavesBothAsTheyWere) {
+TEST(ChanmeterRecordSampleTest, ABucketWithoutABoundLeavesBothUnchanged) {
   ChanmeterRecord record = fullRecord(kChanmeterFormatHistogram);
   record.buckets = {{.upper = 10, .hits = 1}, {.lower = 1, .hits = 1}, {.hits = 1}};
   const ChanmeterRecordSample sample = sampleOf(record);

@@ -46,7 +46,7 @@ TEST_F(RecordChanmeterTest, CountsTheChannelsOfASet) {
   EXPECT_FALSE(error);
 }
 
-TEST_F(RecordChanmeterTest, IteratesInTheSamplesOrder) {
+TEST_F(RecordChanmeterTest, IteratesInTheOrderOfTheSamples) {
   EXPECT_THAT(valuesOf(*sample()), ElementsAre(1, 2, 3));
 }
 
@@ -55,7 +55,7 @@ TEST_F(RecordChanmeterTest, ACallbacksResultOtherThanZeroEndsTheIteration) {
   EXPECT_THAT(valuesOf(*sample(), -1), ElementsAre(1));
 }
 
-TEST_F(RecordChanmeterTest, SamplesStayWhatTheyWereWhenTheChannelsGoOn) {
+TEST_F(RecordChanmeterTest, SamplesDoNotChangeWithTheChannels) {
   const Chanmeter::Samples before = sample();
   chanmeter.setRecords({simple(speaker("a"), 10)});
   EXPECT_THAT(valuesOf(*before), ElementsAre(1, 2, 3));
@@ -71,7 +71,7 @@ TEST_F(RecordChanmeterTest, ADeltaHoldsWhatChanged) {
   EXPECT_FALSE(error);
 }
 
-TEST_F(RecordChanmeterTest, ADeltaAgainstNothingFailsWithACode) {
+TEST_F(RecordChanmeterTest, ADeltaWithoutEarlierSamplesFailsWithACode) {
   EXPECT_EQ(chanmeter.createSamplesDelta(nullptr, sample(), error), nullptr);
   ASSERT_TRUE(error);
   EXPECT_EQ(error->code, 1);

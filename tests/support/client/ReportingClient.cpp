@@ -110,7 +110,7 @@ std::error_code ReportingClient::notify(std::string_view method, const Arguments
 
 std::error_code ReportingClient::send(std::string_view frame) {
   const std::error_code error = connection_->socket.send(frame, sendTimeout_);
-  if (error) disconnect();  // half a frame may be out, and nothing can follow it
+  if (error) disconnect();  // half a frame may have been sent, and nothing can follow it
   return error;
 }
 
@@ -121,7 +121,7 @@ std::error_code ReportingClient::receive(milliseconds timeout) {
     auto waiting = connection_->waiting.extract(frame.identifier);
     if (!waiting.empty()) arrive({std::move(waiting.mapped()), answerOf(frame)});
   }
-  // The last answers are handed out before the connection fails.
+  // Passes on the last answers before the connection fails.
   if (error && error != std::errc::timed_out && !hasArrivals()) disconnect();
   return error;
 }

@@ -13,34 +13,35 @@
 
 namespace tonewerk {
 
-// A connection over a socket of its own, which sends whatever fits a frame.
+// A connection over its own socket. It sends everything that fits in a frame.
 class ReportingClient : public RpcClient {
  public:
   ReportingClient();
   ~ReportingClient() override;
 
-  // Where a daemon may listen, in the order in which to try: TONEWERK_REPORTING_SOCKET alone when it is set,
-  // else the caller's own runtime directory, then the system's.
+  // Returns where a daemon may listen, in the order in which to try: only TONEWERK_REPORTING_SOCKET when it
+  // is set, else the caller's own runtime directory, then the system's.
   static std::vector<std::string> socketPaths();
 
-  // Connects to the first path on which somebody listens. An earlier connection is closed first; handlers
-  // still waiting are dropped. The error is that of the last path tried.
+  // Connects to the first path on which somebody listens. It first closes an earlier connection and drops its
+  // waiting handlers. The error is that of the last path tried.
   [[nodiscard]] std::error_code connect(const std::vector<std::string>& paths = socketPaths());
   void disconnect();
   bool isConnected() const;
-  // The path that connect() last connected to; empty before.
+  // Returns the path that connect() last connected to; empty before.
   const std::string& socketPath() const { return socketPath_; }
 
   int fileDescriptor() const override;
   // A failure ends the connection.
   [[nodiscard]] std::error_code request(std::string_view method, const Arguments& arguments,
                                         AnswerHandler handler) override;
-  // The same without an answer.
+  // Sends a request that gets no answer.
   [[nodiscard]] std::error_code notify(std::string_view method, const Arguments& arguments);
-  // Instead of 10 s, while the daemon reads nothing.
+  // Sets how long to wait while the daemon reads nothing; 10 s without it.
   void setSendTimeout(std::chrono::milliseconds timeout);
 
-  // The message request's arguments. `reporterIDs` empty means nil: every started session.
+  // Returns the arguments of a sendMessage request. Empty `reporterIDs` become nil, which means every started
+  // session.
   static Arguments messageArguments(ValueMap message, std::uint32_t category, std::uint16_t type,
                                     const std::vector<std::int64_t>& reporterIDs);
 

@@ -23,13 +23,13 @@ constexpr std::size_t kReadBytes = std::size_t{64} * 1024;
 
 std::error_code lastError() { return {errno, std::generic_category()}; }
 
-int forPoll(milliseconds timeout) {
-  const auto most = static_cast<milliseconds::rep>(std::numeric_limits<int>::max());
-  return static_cast<int>(std::clamp<milliseconds::rep>(timeout.count(), 0, most));
+int pollTimeout(milliseconds timeout) {
+  const auto maximum = static_cast<milliseconds::rep>(std::numeric_limits<int>::max());
+  return static_cast<int>(std::clamp<milliseconds::rep>(timeout.count(), 0, maximum));
 }
 
 timeval timevalOf(milliseconds timeout) {
-  // Zero would mean to wait for ever.
+  // Zero would mean to wait for ever, so it becomes the shortest time.
   const auto count = std::max<milliseconds::rep>(timeout.count(), 1);
   timeval time{};
   time.tv_sec = count / 1000;
@@ -37,13 +37,13 @@ timeval timevalOf(milliseconds timeout) {
   return time;
 }
 
-// Waits until the socket is ready for one of `events`; 0 when the time is up first.
+// Waits until the socket is ready for one of `events`. Returns 0 when `timeout` passed first, or on an error.
 [[nodiscard]] short waitFor(int descriptor, short events, milliseconds timeout, std::error_code& error) {
   const auto until = std::chrono::steady_clock::now() + timeout;
   for (;;) {
     pollfd polled{descriptor, events, 0};
     const auto left = std::chrono::ceil<milliseconds>(until - std::chrono::steady_clock::now());
-    if (::poll(&polled, 1, forPoll(left)) >= 0) return polled.revents;
+    if (::poll(&polled, 1, pollTimeout(left)) >= 0) return polled.revents;
     if (errno == EINTR) continue;
     error = lastError();
     return 0;
@@ -82,7 +82,7 @@ std::error_code RpcClientSocket::send(std::string_view frame, milliseconds timeo
     const short ready = waitFor(socket_.get(), POLLIN | POLLOUT, timeout, error);
     if (error) return error;
     if (ready == 0) return std::make_error_code(std::errc::timed_out);
-    if ((ready & POLLIN) != 0) error = takeIn();
+    if ((ready & POLLIN) != 0) error = readAvailable();
     if (error) return error;
   }
   return {};
@@ -90,11 +90,11 @@ std::error_code RpcClientSocket::send(std::string_view frame, milliseconds timeo
 
 std::error_code RpcClientSocket::receive(milliseconds timeout) {
   std::error_code error;
-  if (waitFor(socket_.get(), POLLIN, timeout, error) != 0) return takeIn();
+  if (waitFor(socket_.get(), POLLIN, timeout, error) != 0) return readAvailable();
   return error ? error : std::make_error_code(std::errc::timed_out);
 }
 
-std::error_code RpcClientSocket::takeIn() {
+std::error_code RpcClientSocket::readAvailable() {
   std::array<char, kReadBytes> bytes;
   for (;;) {
     const ssize_t count = ::recv(socket_.get(), bytes.data(), bytes.size(), MSG_DONTWAIT);

@@ -42,7 +42,7 @@ bool ManualClock::advanceUntil(std::chrono::nanoseconds duration, const std::fun
   const std::chrono::nanoseconds end = monotonic() + duration;
   if (isDone()) return true;
   while (Alarm* alarm = earliestUntil(end)) {
-    // An alarm may itself have moved the clock past the next one's time.
+    // An alarm may have moved the clock beyond the time of the next one.
     moveTo(std::max(monotonic(), *alarm->nextDue()));
     alarm->runNext();
     if (isDone()) return true;

@@ -23,13 +23,13 @@ class ManualClock final : public Clock {
  public:
   static constexpr double kStart = 1'763'633'880.0;  // 2025-11-20T10:18:00Z
 
-  // Something that wants to run when monotonic time reaches a moment: ManualTimers.
+  // Something that runs when monotonic time reaches a moment, such as ManualTimers.
   class Alarm {
    public:
     virtual ~Alarm() = default;
-    // None when nothing waits.
+    // Returns none when nothing waits.
     virtual std::optional<std::chrono::nanoseconds> nextDue() const = 0;
-    // Runs one thing that is due; called with the clock at nextDue().
+    // Runs one thing that is due. Called while the clock is at nextDue().
     virtual void runNext() = 0;
   };
 
@@ -38,22 +38,22 @@ class ManualClock final : public Clock {
   double now() const override;
   std::chrono::nanoseconds monotonic() const override;
   std::chrono::minutes utcOffset(double at) const override;
-  // Moves both times forward, as advance() does: whoever sleeps on this clock is who moves it.
+  // Moves both times forward like advance(): a caller that sleeps on this clock moves it.
   void sleep(std::chrono::nanoseconds duration) override;
 
-  // Moves both times forward. What is due on the way runs in order, each at its own time.
+  // Moves both times forward. Everything that becomes due runs in order, each at its own time.
   void advance(std::chrono::nanoseconds duration);
   void advance(double seconds);
-  // As advance(duration), but no further than to where `isDone` says so, which is asked at the beginning and
-  // after everything that was due. True when it did.
+  // Like advance(duration), but stops when `isDone` returns true. It asks `isDone` at the beginning and after
+  // everything that ran. Returns true when `isDone` did.
   [[nodiscard]] bool advanceUntil(std::chrono::nanoseconds duration, const std::function<bool()>& isDone);
   void setNow(double seconds);
   void setUtcOffset(std::chrono::minutes offset);
 
-  // How often now() was asked.
+  // Returns how often now() was called.
   std::uint64_t wallReads() const;
 
-  // `alarm` is removed before it dies.
+  // `alarm` must be removed before it is destroyed.
   void addAlarm(Alarm& alarm);
   void removeAlarm(Alarm& alarm);
 

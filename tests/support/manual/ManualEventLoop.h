@@ -10,8 +10,8 @@
 
 namespace tonewerk {
 
-// An event loop whose timers follow a clock that tests move, and whose descriptors are looked at when a test
-// says so. Outlives what it made.
+// An event loop whose timers follow a clock that tests move, and that checks its descriptors when a test asks
+// for it. It outlives the objects that it makes.
 class ManualEventLoop final : public EventLoop, private ManualClock::Alarm {
  public:
   explicit ManualEventLoop(ManualClock& clock);
@@ -20,8 +20,8 @@ class ManualEventLoop final : public EventLoop, private ManualClock::Alarm {
   [[nodiscard]] std::unique_ptr<Source> watch(int descriptor, std::function<void()> onReadable) override;
   [[nodiscard]] std::unique_ptr<Timer> makeTimer(std::function<void()> onExpired) override;
 
-  // Waits, for seconds at most, until a watched descriptor is readable, and runs its callback. False when
-  // none was.
+  // Waits, at most some seconds, until a watched descriptor is readable, and runs its callback. Returns false
+  // when none became readable.
   [[nodiscard]] bool runReadable();
 
  private:

@@ -29,7 +29,7 @@ std::size_t ManualQueues::runAll() {
   std::size_t count = 0;
   for (bool ran = true; ran;) {
     ran = false;
-    // By place, since work may make queues and destroy others.
+    // By index, because work may make queues and destroy others.
     for (std::size_t at = 0; at < queues_.size(); ++at) {
       const std::size_t some = queues_[at]->runAll();
       count += some;

@@ -24,11 +24,11 @@ class ManualQueues final : public SerialQueueFactory {
   [[nodiscard]] std::unique_ptr<SerialQueue> makeSerialQueue(std::string name,
                                                              QueuePriority priority) override;
 
-  // Null when no living queue has the name; the first of several.
+  // Returns null when no living queue has the name, and the first when several have it.
   ManualSerialQueue* find(std::string_view name) const;
-  // The names of the living queues, in the order in which they were made.
+  // Returns the names of the living queues, in the order in which they were made.
   std::vector<std::string> names() const;
-  // How many pieces of work ran.
+  // Returns how many pieces of work ran.
   std::size_t runAll();
 
  private:

@@ -8,13 +8,13 @@
 
 namespace tonewerk {
 
-// Semaphores whose waits move the test's clock instead of blocking: up to the signal, which something that is
-// due on the way gives, or else to the end of the time-out.
+// Makes semaphores whose waits move the test's clock instead of blocking: up to the signal, which something
+// that becomes due may give, or else to the end of the timeout.
 //
 //   test.runtrace.onStart({MemoryRuntrace::didStart().after(14s)});
 //   session->start();                        // waits: 14 s later the callback comes
 //
-// Waits happen on the thread that moves the clock; signals come from any.
+// A wait must be on the thread that moves the clock; any thread may signal.
 class ManualSemaphores final : public SemaphoreFactory {
  public:
   // `clock` outlives the semaphores.

@@ -19,7 +19,8 @@ namespace tonewerk {
 //   queue.async([&] { done = true; });
 //   queue.runAll();                          // also runs what the work itself queues
 //
-// async() from any thread; what runs work (runAll, drain, the destructor) from one thread at a time.
+// Any thread may call async(). Functions that run work (runAll, drain, the destructor) must be called by one
+// thread at a time.
 class ManualSerialQueue final : public SerialQueue {
  public:
   explicit ManualSerialQueue(std::string name, QueuePriority priority = QueuePriority::kUtility)
@@ -31,11 +32,11 @@ class ManualSerialQueue final : public SerialQueue {
   void async(Task work) override;
   void drain() override { runAll(); }
   bool isCurrent() const override { return runner_.load() == std::this_thread::get_id(); }
-  // Also the thread that made the queue: tests call what lives on it directly.
+  // Also true on the thread that made the queue: tests call objects that live on the queue directly.
   bool ownsThisThread() const override { return isCurrent() || std::this_thread::get_id() == maker_; }
   const std::string& name() const override { return name_; }
 
-  // Runs until nothing waits; how many pieces ran. Not from the queue's own work.
+  // Runs work until none waits. Returns how many pieces ran. Do not call it from the queue's own work.
   std::size_t runAll();
   std::size_t pendingCount() const;
   QueuePriority priority() const { return priority_; }

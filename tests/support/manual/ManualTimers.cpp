@@ -42,7 +42,7 @@ void ManualTimers::runNext() {
     std::erase_if(entries_, [](const auto& held) { return held.expired(); });
     entry = earliest();
     if (entry == nullptr) return;
-    // Missed ticks are not made up for: the next one is the first that still lies ahead.
+    // Missed ticks are skipped: the next one is the first that is still in the future.
     const std::chrono::nanoseconds late = clock_.monotonic() - entry->due;
     entry->due += entry->interval * (late / entry->interval + 1);
     isTicking_ = true;

@@ -11,7 +11,7 @@
 
 namespace tonewerk {
 
-// Timers whose ticks run on the test's own thread, inside ManualClock::advance(), in the order of their
+// Makes timers whose ticks run on the test's own thread, inside ManualClock::advance(), in the order of their
 // times.
 //
 //   ManualClock clock;
@@ -19,8 +19,8 @@ namespace tonewerk {
 //   auto timer = timers.repeat(1s, [&] { ++ticks; });
 //   clock.advance(3.0);                      // ticks == 3
 //
-// A tick may destroy its own timer or any other, and make new ones. Timers may outlive the service; they are
-// then silent.
+// A tick may destroy its own timer or any other, and make new ones. Timers may outlive the service; they then
+// never tick.
 class ManualTimers final : public TimerService, private ManualClock::Alarm {
  public:
   // `clock` outlives the timers.
@@ -32,7 +32,7 @@ class ManualTimers final : public TimerService, private ManualClock::Alarm {
   [[nodiscard]] std::unique_ptr<Timer> repeat(std::chrono::milliseconds interval,
                                               std::function<void()> tick) override;
 
-  // How many timers exist.
+  // Returns how many timers exist.
   std::size_t count() const;
 
  private:

@@ -11,7 +11,8 @@
 
 namespace tonewerk {
 
-// Benchmark data as lines of text in a MemoryFileSystem: "TWReporting 4", then "decode 1.5" for each value.
+// Writes benchmark data as lines of text in a MemoryFileSystem: "TWReporting 4", then for example "decode
+// 1.5" for each value.
 class MemoryBenchfile final : public Benchfile {
  public:
   // `files` outlives this.

@@ -11,12 +11,12 @@
 
 namespace tonewerk {
 
-// Keeps the captures that were asked for, and answers when the test says so.
+// Records the captures that were asked for, and answers when the test says so.
 //
 //   capsa.answer(0, MemoryCapsa::started("S1"));   // the first request's handler is called here
 //   EXPECT_THAT(capsa.cancelled(), ElementsAre("S1"));
 //
-// At the beginning parameters are accepted and no answer comes. Any thread.
+// At first it accepts all parameters and sends no answer. Any thread.
 class MemoryCapsa final : public Capsa {
  public:
   using ReplyMap = std::optional<ValueMap>;
@@ -35,17 +35,17 @@ class MemoryCapsa final : public Capsa {
 
   [[nodiscard]] std::unique_ptr<FaultsignReporter> makeReporter() override;
 
-  // From now on parameters are not accepted.
+  // From now on it does not accept parameters.
   void refuse();
-  // From now on every request is answered with this before it returns.
+  // From now on it answers every request with this before the call returns.
   void answerAtOnce(ReplyMap reply);
-  // Answers request number `at` on the calling thread.
+  // Answers the request with index `at` on the calling thread.
   void answer(std::size_t at, const ReplyMap& reply);
 
   static ReplyMap started(const std::string& sessionIdentifier);
   static ReplyMap failed(FaultsignError reason);
 
-  // Refused ones included.
+  // Returns all requests, also refused ones.
   std::vector<Request> requests() const;
   std::vector<std::string> cancelled() const;
   std::size_t reporterCount() const;

@@ -51,7 +51,7 @@ std::size_t MemoryChanmeter::heldSamples() const {
   return static_cast<std::size_t>(held);
 }
 
-void MemoryChanmeter::note(const std::string& operation, const Group& group) {
+void MemoryChanmeter::record(const std::string& operation, const Group& group) {
   calls_.push_back(operation + " " + textOf(group));
 }
 
@@ -75,7 +75,7 @@ Chanmeter::Channels MemoryChanmeter::copyChannelsInGroup(const std::optional<std
                                                          std::optional<ChanmeterError>& error) {
   const MutexLock lock(mutex_);
   const Group asked{group, subGroup};
-  note("copyChannelsInGroup", asked);
+  record("copyChannelsInGroup", asked);
   if (fails(Operation::kCopyChannels, asked, error)) return nullptr;
   auto channels = std::make_shared<ChanmeterChannelSet>(chanmeterRecordsIn(records_, group, subGroup));
   groups_[channels] = asked;
@@ -86,7 +86,7 @@ Chanmeter::Subscription MemoryChanmeter::createSubscription(const Channels& chan
                                                             std::optional<ChanmeterError>& error) {
   const MutexLock lock(mutex_);
   const Group group = groups_.at(channels);
-  note("createSubscription", group);
+  record("createSubscription", group);
   if (fails(Operation::kCreateSubscription, group, error)) return nullptr;
   if (!fails(Operation::kSubscribedChannels, group, error)) subscribed = channels;
   if (fails(Operation::kSubscriptionHandle, group, error)) return nullptr;
@@ -100,23 +100,23 @@ Chanmeter::Samples MemoryChanmeter::createSamples(const Subscription& subscripti
                                                   std::optional<ChanmeterError>& error) {
   const MutexLock lock(mutex_);
   const Group group = groups_.at(subscription);
-  note("createSamples", group);
+  record("createSamples", group);
   if (fails(Operation::kCreateSamples, group, error)) return nullptr;
   const auto& channels = static_cast<const ChanmeterChannelSet&>(*subscribed);
-  return remembered(std::make_shared<ChanmeterRecordSamples>(channels.selectedFrom(records_)), group);
+  return track(std::make_shared<ChanmeterRecordSamples>(channels.selectedFrom(records_)), group);
 }
 
 Chanmeter::Samples MemoryChanmeter::createSamplesDelta(const Samples& earlier, const Samples& later,
                                                        std::optional<ChanmeterError>& error) {
   const MutexLock lock(mutex_);
   const Group group = groups_.at(later);
-  note("createSamplesDelta", group);
+  record("createSamplesDelta", group);
   if (fails(Operation::kCreateSamplesDelta, group, error)) return nullptr;
   Samples delta = RecordChanmeter::createSamplesDelta(earlier, later, error);
-  return delta == nullptr ? nullptr : remembered(std::move(delta), group);
+  return delta == nullptr ? nullptr : track(std::move(delta), group);
 }
 
-Chanmeter::Samples MemoryChanmeter::remembered(Samples samples, const Group& group) {
+Chanmeter::Samples MemoryChanmeter::track(Samples samples, const Group& group) {
   groups_[samples] = group;
   samples_.emplace_back(samples);
   return samples;

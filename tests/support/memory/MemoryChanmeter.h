@@ -14,7 +14,7 @@
 
 namespace tonewerk {
 
-// Channels that a test sets. Any thread.
+// Provides channels that a test sets. Any thread.
 //
 //   chanmeter.setRecords({{.key = {.driver = "Amp", .group = "Speaker"}, .format = 1, .value = 12}});
 //   chanmeter.fail(MemoryChanmeter::Operation::kCreateSamples, {.code = 5}, {{.group = "Speaker"}});
@@ -22,33 +22,34 @@ class MemoryChanmeter final : public RecordChanmeter {
  public:
   enum class Operation {
     kCopyChannels,
-    kCreateSubscription,  // neither a handle nor channels
-    kSubscriptionHandle,  // createSubscription() gives the channels alone
-    kSubscribedChannels,  // and the handle alone
+    kCreateSubscription,  // createSubscription() returns neither a handle nor channels
+    kSubscriptionHandle,  // createSubscription() returns only the channels
+    kSubscribedChannels,  // createSubscription() returns only the handle
     kCreateSamples,
     kCreateSamplesDelta
   };
   struct Failure {
-    std::optional<std::int64_t> code = {};  // none: nothing comes, no error either
-    bool resultComes = false;               // all the same
+    std::optional<std::int64_t> code = {};  // none: it returns nothing and no error
+    bool resultComes = false;               // it returns a result in spite of the error
   };
-  // As copyChannelsInGroup() was asked for it.
+  // A group as passed to copyChannelsInGroup().
   struct Group {
     std::optional<std::string> group = {};
     std::optional<std::string> subGroup = {};
     friend bool operator==(const Group&, const Group&) = default;
   };
 
-  // The channels and their values from now on.
+  // Sets the channels and their values from now on.
   void setRecords(std::vector<ChanmeterRecord> records);
-  // From now on that operation fails, of one group or of all.
+  // From now on that operation fails, for one group or for all.
   void fail(Operation operation, Failure failure, std::optional<Group> onlyOf = std::nullopt);
   void failNoMore();
 
-  // Such as "copyChannelsInGroup Speaker-(null)", in order; iterate() and channelCount() are not noted.
+  // Returns the calls in order, such as "copyChannelsInGroup Speaker-(null)". iterate() and channelCount()
+  // are not recorded.
   std::vector<std::string> calls() const;
   void forgetCalls();
-  // Samples and deltas that somebody still holds.
+  // Returns how many samples and deltas still exist.
   std::size_t heldSamples() const;
 
   [[nodiscard]] Channels copyChannelsInGroup(const std::optional<std::string>& group,
@@ -68,19 +69,19 @@ class MemoryChanmeter final : public RecordChanmeter {
     std::optional<Group> onlyOf;
   };
 
-  void note(const std::string& operation, const Group& group) REQUIRES(mutex_);
-  // Null when the operation is to succeed.
+  void record(const std::string& operation, const Group& group) REQUIRES(mutex_);
+  // Returns null when the operation is to succeed.
   const Failure* failureOf(Operation operation, const Group& group) const REQUIRES(mutex_);
-  // Fills `error`; whether the result is to be withheld.
+  // Sets `error`. Returns whether the result is to be withheld.
   bool fails(Operation operation, const Group& group, std::optional<ChanmeterError>& error) const
       REQUIRES(mutex_);
-  Samples remembered(Samples samples, const Group& group) REQUIRES(mutex_);
+  Samples track(Samples samples, const Group& group) REQUIRES(mutex_);
 
   mutable Mutex mutex_;
   ChanmeterRecords records_ GUARDED_BY(mutex_);
   std::vector<Rule> rules_ GUARDED_BY(mutex_);
   std::vector<std::string> calls_ GUARDED_BY(mutex_);
-  // What was handed out, and for which group.
+  // The objects that were returned, and the group of each.
   std::map<std::weak_ptr<const void>, Group, std::owner_less<>> groups_ GUARDED_BY(mutex_);
   std::vector<std::weak_ptr<const ChanmeterSamples>> samples_ GUARDED_BY(mutex_);
 };

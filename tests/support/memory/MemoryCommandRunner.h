@@ -11,7 +11,8 @@
 
 namespace tonewerk {
 
-// Commands that end as the test says. One that it says nothing of cannot be started. Any thread.
+// Runs commands that end as the test says. A command about which the test says nothing cannot be started. Any
+// thread.
 //
 //   test.commands.answer("slabtop --once", "a line\n");
 //   test.commands.answer("tool", {"half a li", CommandRunner::End::kTooLong});
@@ -32,9 +33,9 @@ class MemoryCommandRunner final : public CommandRunner {
   void hold(const std::string& command);
   void release(const std::string& command);
 
-  // In the order in which they began.
+  // Returns the runs in the order in which they began.
   std::vector<Run> runs() const;
-  // Returns when that many have begun.
+  // Returns when `count` runs have begun.
   void awaitRuns(std::size_t count);
 
  private:

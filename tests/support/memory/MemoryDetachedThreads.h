@@ -12,7 +12,7 @@
 
 namespace tonewerk {
 
-// Real threads, of which the test waits for every one: its end joins them. Any thread.
+// Starts real threads; the destructor joins them. Any thread.
 //
 //   test.threads.refuse("twr-memory-0", std::errc::resource_unavailable_try_again);
 //   EXPECT_THAT(test.threads.started(), ElementsAre("twr-memory-1"));
@@ -35,12 +35,12 @@ class MemoryDetachedThreads final : public DetachedThreads {
     return {};
   }
 
-  // From now on no thread of that name can be started.
+  // From now on no thread with that name can be started.
   void refuse(const std::string& name, std::errc error) {
     const MutexLock lock(mutex_);
     refusals_[name] = error;
   }
-  // The names of those that were started, in order.
+  // Returns the names of the threads that were started, in order.
   std::vector<std::string> started() const {
     const MutexLock lock(mutex_);
     return started_;

@@ -6,8 +6,8 @@
 
 namespace tonewerk {
 
-// Facts that the test states before anybody asks: deviceFacts.set("InternalBuild", true). One thread writes,
-// and nobody reads meanwhile.
+// Gives facts that the test sets before anybody reads them: deviceFacts.set("InternalBuild", true). One
+// thread writes, and no other thread reads at that time.
 class MemoryDeviceFacts final : public DeviceFacts {
  public:
   std::optional<bool> boolean(std::string_view property) const override {

@@ -10,10 +10,10 @@
 
 namespace tonewerk {
 
-// Keeps the metrics that were posted. Any thread.
+// Records the metrics that were posted. Any thread.
 //
-//   EXPECT_THAT(diagwire.posts(), ElementsAre(MemoryDiagwire::Post{0x5B0003, {"2=7", "3=overload", "4=",
-//   "5="}}));
+//   EXPECT_THAT(diagwire.posts(),
+//               ElementsAre(MemoryDiagwire::Post{0x5B0003, {"2=7", "3=overload", "4=", "5="}}));
 class MemoryDiagwire final : public Diagwire {
  public:
   struct Post {

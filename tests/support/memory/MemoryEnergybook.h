@@ -10,7 +10,7 @@
 
 namespace tonewerk {
 
-// Keeps the events that were recorded. Any thread.
+// Records the events that were sent. Any thread.
 //
 //   EXPECT_THAT(test.energybook.events(), SizeIs(1));
 class MemoryEnergybook final : public Energybook {

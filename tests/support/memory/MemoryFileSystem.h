@@ -13,14 +13,14 @@
 
 namespace tonewerk {
 
-// Directories and files in memory, with failures on demand. Any thread.
+// Holds directories and files in memory, and fails when a test asks for it. Any thread.
 //
 //   MemoryFileSystem files;
 //   files.failWrite(2, std::errc::no_space_on_device);       // the second write() from now on
 //   ...
 //   EXPECT_EQ(files.contents("/logs/Audio/summary.json"), "{}");
 //
-// Paths are compared as they are written; they begin with a slash and do not end with one.
+// It compares paths as they are written. They begin with a slash and do not end with one.
 class MemoryFileSystem final : public FileSystem {
  public:
   MemoryFileSystem();
@@ -33,25 +33,25 @@ class MemoryFileSystem final : public FileSystem {
   [[nodiscard]] std::error_code moveFile(const std::string& from, const std::string& directory,
                                          const std::string& name) override;
 
-  // std::errc() makes the call succeed again.
+  // From now on the call fails with `error`; std::errc() makes it succeed again.
   void failCreateDirectories(std::errc error);
   void failCreateFile(std::errc error);
-  // The `nth` write() from now on fails, 1 the next one; every other succeeds.
+  // The `nth` write() from now on fails; 1 is the next one. All others succeed.
   void failWrite(int nth, std::errc error);
-  // Also of a file that was written as it should.
+  // place() then fails also for a file that was written without an error.
   void failPlace(std::errc error);
   void failReadFile(std::errc error);
   void failMoveFile(std::errc error);
-  // A file with this text, its directories included.
+  // Adds a file with this text, and its directories.
   void addFile(const std::string& path, std::string text);
   void addSymbolicLink(const std::string& path);
 
-  // None without such a file; a new one is none before it is placed.
+  // Returns none when there is no such file. A new file has no contents before it is placed.
   std::optional<std::string> contents(const std::string& path) const;
   std::vector<std::string> files() const;
-  // The mode that the directory was made with; none without such a directory.
+  // Returns the mode with which the directory was made; none when there is no such directory.
   std::optional<unsigned> directoryMode(const std::string& path) const;
-  // How many new files have neither been placed nor given up.
+  // Returns how many new files have been neither placed nor destroyed.
   int openFiles() const;
 
  private:
@@ -69,7 +69,7 @@ class MemoryFileSystem final : public FileSystem {
     std::errc moveFailure GUARDED_BY(mutex){};
     int openFiles GUARDED_BY(mutex) = 0;
 
-    // Whether something stands there.
+    // Returns whether `path` exists.
     bool holds(const std::string& path) const REQUIRES(mutex) {
       return files.contains(path) || directories.contains(path) || links.contains(path);
     }

@@ -12,7 +12,7 @@
 
 namespace tonewerk {
 
-// Keeps the drafts that were handed over, and answers for one when it is told to. Any thread.
+// Records the drafts that were requested, and answers for one when the test asks for it. Any thread.
 //
 //   EXPECT_THAT(test.issueDrafts.requests(), SizeIs(1));
 //   test.issueDrafts.answerNext();                          // made
@@ -29,9 +29,9 @@ class MemoryIssueDraftService final : public IssueDraftService {
                    CompletionHandler completionHandler) override;
 
   std::vector<Request> requests() const;
-  // Requests that nobody has answered.
+  // Returns the number of requests without an answer.
   std::size_t unanswered() const;
-  // Runs the oldest unanswered request's handler here. False when there is none.
+  // Runs the handler of the oldest unanswered request here. Returns false when there is none.
   [[nodiscard]] bool answerNext(const std::optional<std::string>& error = std::nullopt);
 
  private:

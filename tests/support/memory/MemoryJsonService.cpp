@@ -9,7 +9,7 @@
 namespace tonewerk {
 namespace {
 
-// Null when everything in `value` is finite, else the value that is not.
+// Returns the first number in `value` that is not finite; null when all are finite.
 const double* notFinite(const Value& value) {
   if (const double* number = value.asDouble()) return std::isfinite(*number) ? nullptr : number;
   if (const ValueArray* array = value.asArray()) {

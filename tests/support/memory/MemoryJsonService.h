@@ -5,8 +5,8 @@
 
 namespace tonewerk {
 
-// JSON without the daemon's JSON adapter: compact text by the values' own writer, pretty text by a few lines
-// of its own, indented by two spaces. Any thread.
+// Implements JSON without the daemon's JSON adapter: compact text by the values' own writer, and pretty text
+// with an indentation of two spaces. Any thread.
 class MemoryJsonService final : public JsonService {
  public:
   std::string compact(const ValueMap& map) const override;

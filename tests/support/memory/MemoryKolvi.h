@@ -12,7 +12,8 @@
 
 namespace tonewerk {
 
-// Traces that a test makes up: which intervals a signpost has, in a unit of time of its own. One thread.
+// Provides traces that a test defines: the intervals of each signpost, in the test's own unit of time. One
+// thread.
 //
 //   kolvi.intervals["decode"] = {1000, 2500};       // microseconds
 class MemoryKolvi final : public Kolvi {
@@ -24,7 +25,7 @@ class MemoryKolvi final : public Kolvi {
 
   std::map<std::string, std::vector<std::uint64_t>> intervals;  // by signpost
   std::optional<std::string> failure;                           // opening fails with it
-  std::vector<std::string> opened;                              // the locations so far
+  std::vector<std::string> opened;                              // the locations that were opened
 };
 
 }  // namespace tonewerk

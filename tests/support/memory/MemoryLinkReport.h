@@ -12,7 +12,7 @@
 
 namespace tonewerk {
 
-// Keeps what real-time-communication sessions were made with and sent, and answers with backends when the
+// Records what real-time-communication sessions were made with and sent, and answers with backends when the
 // test says so.
 //
 //   linkReport.answerLater();
@@ -34,7 +34,7 @@ class MemoryLinkReport final : public LinkReport {
     std::vector<Message> messages;
     std::size_t flushCount = 0;
     bool isOpen = true;
-    LinkReportSession::CompletionHandler handler;  // null until the backends were asked for
+    LinkReportSession::CompletionHandler handler;  // null until the session asks for backends
   };
 
   MemoryLinkReport();
@@ -45,18 +45,18 @@ class MemoryLinkReport final : public LinkReport {
   [[nodiscard]] std::unique_ptr<LinkReportSession> initWithSessionInfo(
       const ValueMap& sessionInfo, const ValueMap& userInfo, const ValueArray* frameworksToCheck) override;
 
-  // From now on sessions get these backends as soon as they ask; at the beginning {"memory"}.
+  // From now on sessions get these backends as soon as they ask; at first {"memory"}.
   void answerAtOnce(LinkReportSession::Backends backends);
-  // From now on sessions get no answer but by answer().
+  // From now on sessions get an answer only from answer().
   void answerLater();
-  // Calls the handler of the session made as number `at`.
+  // Calls the handler of the session with index `at`, in the order of creation.
   void answer(std::size_t at, LinkReportSession::Backends backends);
 
   void giveNoTokens();
-  // From now on sending fails, with this problem.
+  // From now on sending fails with this problem.
   void failSending(std::string problem);
 
-  // The sessions made so far, ended ones included.
+  // Returns the number of sessions made so far, also of ended ones.
   std::size_t count() const;
   Session session(std::size_t at) const;
 

@@ -11,7 +11,7 @@
 
 namespace tonewerk {
 
-// Keeps log lines for a test to look at. Everything is enabled until a threshold is set. Any thread.
+// Records log lines for a test. Every line is enabled until a threshold is set. Any thread.
 //
 //   MemoryLog log;
 //   EXPECT_THAT(log.textsOf("twrr"), ElementsAre("stop called. reporterID=77"));
@@ -28,26 +28,26 @@ class MemoryLog final : public Log {
     friend bool operator==(const Line&, const Line&) = default;
   };
 
-  // `message` without its "%25s:%-5d " of source file and line; as it is when it begins with no such prefix.
+  // Returns `message` without its "%25s:%-5d " of source file and line; unchanged when it has no such prefix.
   static std::string withoutPrefix(std::string_view message);
 
   bool isEnabled(std::string_view category, LogLevel level) const override;
   void write(std::string_view subsystem, std::string_view category, LogLevel level,
              std::string_view message) override;
 
-  // From now on only lines of at least this level: everywhere, or of one category.
+  // From now on only lines of at least this level are enabled, in all categories or in one.
   void setThreshold(LogLevel level);
   void setThreshold(std::string_view category, LogLevel level);
 
   std::vector<Line> lines() const;
   std::vector<Line> linesOf(std::string_view category) const;
   std::vector<Line> linesOf(std::string_view category, LogLevel level) const;
-  // The messages without their prefixes.
+  // Return the messages without their prefixes.
   std::vector<std::string> textsOf(std::string_view category) const;
   std::vector<std::string> textsOf(std::string_view category, LogLevel level) const;
-  // Of all categories.
+  // Returns the messages of all categories.
   std::vector<std::string> textsAt(LogLevel level) const;
-  // Forgets the lines, keeps the thresholds.
+  // Removes the lines, but keeps the thresholds.
   void clear();
 
  private:

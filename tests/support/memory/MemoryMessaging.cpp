@@ -10,7 +10,7 @@
 
 namespace tonewerk {
 
-// Both ends of the connection; the client, the listener's delegate and replies under way share it.
+// Implements both ends of the connection. The client, the listener's delegate and pending replies share it.
 class MemoryClient::Connection final : public MessagingConnection,
                                        public ReplySink,
                                        public InFlightCounter,
@@ -24,9 +24,9 @@ class MemoryClient::Connection final : public MessagingConnection,
   std::string description() const override {
     return "memory connection of " + std::to_string(processIdentifier_);
   }
-  void exportObject(const RequestSet& interface, std::shared_ptr<RequestHandler> object) override {
-    interface_ = &interface;
-    object_ = std::move(object);
+  void exportObject(const RequestSet& requests, std::shared_ptr<RequestHandler> handler) override {
+    requests_ = &requests;
+    handler_ = std::move(handler);
   }
   void setInterruptionHandler(std::function<void()> handler) override { interrupted_ = std::move(handler); }
   void setInvalidationHandler(std::function<void()> handler) override { invalidated_ = std::move(handler); }
@@ -51,7 +51,7 @@ class MemoryClient::Connection final : public MessagingConnection,
     if (invalidated_) invalidated_();
     interrupted_ = nullptr;
     invalidated_ = nullptr;
-    object_ = nullptr;
+    handler_ = nullptr;
   }
 
   void reply(std::uint32_t requestIdentifier, const std::optional<ReplyError>& error,
@@ -95,15 +95,15 @@ class MemoryClient::Connection final : public MessagingConnection,
   };
 
   void receive(Waiting request) {
-    if (hasEnded() || object_ == nullptr) return;
+    if (hasEnded() || handler_ == nullptr) return;
     if (!isResumed_) {
       waiting_.push_back(std::move(request));
       return;
     }
     const Reply reply = request.identifier ? Reply(shared_from_this(), *request.identifier) : Reply();
-    const std::optional<std::size_t> place = interface_->find(request.method);
+    const std::optional<std::size_t> place = requests_->find(request.method);
     if (!place) return reply(messagingError(kUnknownMethod, "unknown method " + request.method));
-    const Method& method = interface_->methods[*place];
+    const Method& method = requests_->methods[*place];
     if (const auto problem = problemWithCaller(method, userIdentifier_, MemoryMessaging::kOwner)) {
       return reply(problem);
     }
@@ -114,15 +114,15 @@ class MemoryClient::Connection final : public MessagingConnection,
       const MutexLock lock(mutex_);
       ++unfinished_;
     }
-    // Held here, too: the request itself may end the connection.
-    const std::shared_ptr<RequestHandler> object = object_;
-    object->handleRequest(*place, std::move(request.arguments), reply, InFlightToken(shared_from_this(), 0));
+    // Also kept here, because the request itself may end the connection.
+    const std::shared_ptr<RequestHandler> handler = handler_;
+    handler->handleRequest(*place, std::move(request.arguments), reply, InFlightToken(shared_from_this(), 0));
   }
 
   const std::int32_t processIdentifier_;
   const std::uint32_t userIdentifier_;
-  const RequestSet* interface_ = nullptr;
-  std::shared_ptr<RequestHandler> object_;
+  const RequestSet* requests_ = nullptr;
+  std::shared_ptr<RequestHandler> handler_;
   std::function<void()> interrupted_;
   std::function<void()> invalidated_;
   bool isResumed_ = false;

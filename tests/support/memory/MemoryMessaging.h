@@ -13,15 +13,15 @@
 
 namespace tonewerk {
 
-// What a client got back.
+// An answer that a client received.
 struct MemoryResponse {
   std::uint32_t identifier = 0;
   std::optional<ReplyError> error;
   std::optional<Value> result;
 };
 
-// The client's end of a connection made by MemoryMessaging. The messaging thread is whichever thread calls
-// request(), notify() and disconnect(); tests use one. The rest is for any thread.
+// The client's end of a connection made by MemoryMessaging. The thread that calls request(), notify() and
+// disconnect() is the messaging thread; a test uses only one. Any thread may call the other functions.
 class MemoryClient {
  public:
   MemoryClient(const MemoryClient&) = delete;
@@ -29,26 +29,26 @@ class MemoryClient {
   // Disconnects.
   ~MemoryClient();
 
-  // Sends a request and returns its identifier. A method or arguments that the exported interface does not
-  // know are answered with the messaging layer's errors. Goes nowhere once the connection has ended.
+  // Sends a request and returns its identifier. A method or arguments that the request set does not allow are
+  // answered with the messaging layer's errors. After the connection has ended the request is dropped.
   std::uint32_t request(std::string_view method, Arguments arguments);
-  // The same, never answered.
+  // Sends a request that is never answered.
   void notify(std::string_view method, Arguments arguments);
 
-  // Ends the connection: its handlers have returned when this does. Once; later calls do nothing.
+  // Ends the connection. Its handlers have returned when this returns. Later calls do nothing.
   void disconnect();
   bool hasEnded() const;
 
-  // Everything answered so far, in order. A request may be answered several times.
+  // Returns all answers so far, in order. A request may have several answers.
   std::vector<MemoryResponse> responses() const;
-  // The first answer to this request, none so far being null. With a queue of its own behind the exported
-  // object, waitForResponses() says when to look.
+  // Returns the first answer to this request; none when there is no answer yet. When the request handler uses
+  // a queue of its own, waitForResponses() waits for the answers.
   std::optional<MemoryResponse> responseTo(std::uint32_t identifier) const;
-  // Returns true as soon as there are `count` answers, false when that has not happened within `timeout`.
+  // Returns true as soon as there are `count` answers, and false when there are fewer after `timeout`.
   [[nodiscard]] bool waitForResponses(std::size_t count,
                                       std::chrono::milliseconds timeout = std::chrono::seconds(30)) const;
 
-  // Requests whose bodies have not run yet.
+  // Returns the number of requests whose bodies have not run yet.
   std::size_t unfinishedRequests() const;
 
  private:
@@ -60,7 +60,7 @@ class MemoryClient {
   std::uint32_t nextIdentifier_ = 1;
 };
 
-// A MessagingListener in memory, for one process that plays both sides.
+// A MessagingListener in memory, for a process that is both client and daemon.
 class MemoryMessaging final : public MessagingListener {
  public:
   MemoryMessaging();
@@ -73,7 +73,7 @@ class MemoryMessaging final : public MessagingListener {
   // The user that the daemon runs as.
   static constexpr std::uint32_t kOwner = 500;
 
-  // A client process of that user connects. Null when nobody listens or the delegate turns it away.
+  // Connects a client process of that user. Returns null when nobody listens or the delegate refuses it.
   [[nodiscard]] std::unique_ptr<MemoryClient> connect(std::int32_t processIdentifier = 1000,
                                                       std::uint32_t userIdentifier = kOwner);
 

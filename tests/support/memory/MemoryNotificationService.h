@@ -17,7 +17,7 @@
 
 namespace tonewerk {
 
-// Named notifications that live as long as the test. Any thread.
+// Provides named notifications that live as long as the test. Any thread.
 //
 //   notifications.post("com.orvane.x", 1);   // queues the handlers
 //   queues.runAll();                         // runs them
@@ -31,16 +31,16 @@ class MemoryNotificationService final : public NotificationService {
   void cancel(Token token) override;
   [[nodiscard]] std::error_code post(std::string_view name) override;
 
-  // The same with a new state, as somebody else does it.
+  // Posts `name` with a new state, as another process would.
   [[nodiscard]] std::error_code post(std::string_view name, std::uint64_t state);
-  // Its state cannot be read until somebody posts one.
+  // From now on the state of `name` cannot be read, until somebody posts one.
   void makeUnreadable(std::string_view name);
-  // kStatusOk makes registrations succeed again.
+  // From now on registrations fail with `status`; kStatusOk makes them succeed again.
   void failRegistrations(std::uint32_t status);
-  // std::errc() makes posts succeed again.
+  // From now on posts fail with `error`; std::errc() makes them succeed again.
   void failPosts(std::errc error);
 
-  // The names registered now, in the order of their registrations.
+  // Returns the names that are registered now, in the order of their registrations.
   std::vector<std::string> registered() const;
 
  private:

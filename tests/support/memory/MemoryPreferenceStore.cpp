@@ -12,7 +12,7 @@ bool isDomain(std::string_view domain) {
          domain.find('\0') == std::string_view::npos;
 }
 
-// The store's file format has signed integers only.
+// The file format of the real store has only signed integers.
 bool canBeStored(const Value& value) {
   if (const auto* number = value.asUnsigned()) {
     return *number <= static_cast<std::uint64_t>(std::numeric_limits<std::int64_t>::max());

@@ -9,7 +9,7 @@
 
 namespace tonewerk {
 
-// Preferences that live as long as the test. Any thread.
+// Holds preferences that live as long as the test. Any thread.
 //
 //   preferences.configure("com.orvane.x", "limit", 5);       // what the device's configuration says
 //   preferences.write("com.orvane.x", "limit", 6);           // what somebody set
@@ -24,9 +24,9 @@ class MemoryPreferenceStore final : public PreferenceStore {
                                        std::string* problem = nullptr) override;
 
   void configure(std::string_view domain, std::string_view key, const Value& value);
-  // std::errc() makes writes succeed again.
+  // From now on writes and removals fail with `error`; std::errc() makes them succeed again.
   void failWrites(std::errc error);
-  // What was written and differs from the configuration.
+  // Returns the written values that differ from the configuration.
   ValueMap written(std::string_view domain) const;
 
  private:

@@ -8,7 +8,7 @@
 
 namespace tonewerk {
 
-// Processes as the test says they are. Any thread.
+// Gives the processes that the test sets. Any thread.
 //
 //   processes.setName(4242, "player");
 //   processes.failFootprint("Permission denied");
@@ -37,7 +37,7 @@ class MemoryProcessInformation final : public ProcessInformation {
     const MutexLock lock(mutex_);
     names_[processIdentifier] = std::move(name);
   }
-  // The process is gone.
+  // From now on there is no such process.
   void forget(std::int32_t processIdentifier) {
     const MutexLock lock(mutex_);
     names_.erase(processIdentifier);

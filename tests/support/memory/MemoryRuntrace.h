@@ -13,15 +13,15 @@
 
 namespace tonewerk {
 
-// A trace service that calls back when it is told to: at once, later on the test's clock, twice, never, with
-// errors. Until told otherwise it starts and completes at once.
+// A trace service that calls back as the test says: at once, later on the test's clock, twice, never, or with
+// errors. By default it starts and completes at once.
 //
 //   runtrace.onStart({MemoryRuntrace::didStart().after(14s)});
 //   runtrace.onStop({MemoryRuntrace::didStop(), MemoryRuntrace::didComplete("/traces/1")});
 //   runtrace.onStop({});                     // never
 //   runtrace.callBack(0, MemoryRuntrace::didStart("broken"));  // the first session's delegate, now
 //
-// One thread: callbacks come from inside the call that asks, or of the clock's movement.
+// One thread. Callbacks run inside the call that causes them, or while the clock moves.
 class MemoryRuntrace final : public Runtrace, private ManualClock::Alarm {
  public:
   struct Callback {
@@ -53,15 +53,15 @@ class MemoryRuntrace final : public Runtrace, private ManualClock::Alarm {
   [[nodiscard]] std::shared_ptr<RuntraceSession> makeSession(
       const RuntraceConfiguration& configuration) override;
 
-  // For the starts and stops from now on.
+  // Set the callbacks of later starts and stops.
   void onStart(Callbacks callbacks) { onStart_ = std::move(callbacks); }
   void onStop(Callbacks callbacks) { onStop_ = std::move(callbacks); }
 
-  // To the delegate of the session made as number `at`, also when the session is gone. False when there is no
-  // delegate to call.
+  // Calls the delegate of the session with index `at`, also when the session is gone. Returns false when
+  // there is no delegate to call.
   bool callBack(std::size_t at, const Callback& callback);
 
-  // What became of a session.
+  // Records what happened to a session.
   struct Record {
     RuntraceConfiguration configuration;
     std::weak_ptr<RuntraceSessionDelegate> delegate;
@@ -69,7 +69,7 @@ class MemoryRuntrace final : public Runtrace, private ManualClock::Alarm {
     int stops = 0;
     bool isValid = true;
     bool isAlive = true;
-    std::weak_ptr<void> token;  // of the completion; expired when nobody keeps the trace
+    std::weak_ptr<void> token;  // passed with the completion; expired when nobody keeps the trace
   };
   std::size_t count() const { return records_.size(); }
   const Record& record(std::size_t at) const { return *records_.at(at); }
@@ -91,7 +91,7 @@ class MemoryRuntrace final : public Runtrace, private ManualClock::Alarm {
   Callbacks onStart_;
   Callbacks onStop_;
   std::vector<std::shared_ptr<Record>> records_;
-  std::vector<Pending> pending_;  // by due time, those of one time as they came
+  std::vector<Pending> pending_;  // sorted by due time; those with one time in the order of scheduling
 };
 
 }  // namespace tonewerk

@@ -11,7 +11,7 @@
 
 namespace tonewerk {
 
-// A reporting daemon reduced to its memory.
+// Records the sessions that a reporting daemon would get.
 class MemorySessionSink final : public SessionSink {
  public:
   struct Message {
@@ -23,11 +23,11 @@ class MemorySessionSink final : public SessionSink {
     std::int64_t reporterID = 0;
     std::uint16_t serviceType = 0;
     ValueMap configuration;
-    std::vector<std::string> calls;  // each call once made, in order, "message" included
+    std::vector<std::string> calls;  // the names of all calls, "message" included, in order
     std::vector<Message> messages;
   };
 
-  // In order of creation.
+  // In the order of creation.
   std::vector<Session> sessions;
 
   const Session& only() const { return sessions.at(0); }
@@ -57,7 +57,7 @@ class MemorySessionSink final : public SessionSink {
       session.calls.emplace_back(name);
       return session;
     }
-    // A call for a session that nobody created: kept, so that expectations on `sessions` fail.
+    // Records a call for a session that nobody created, so that expectations on `sessions` fail.
     sessions.push_back({});
     sessions.back().calls.emplace_back(std::string(name) + " without create");
     return sessions.back();

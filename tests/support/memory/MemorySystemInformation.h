@@ -6,7 +6,7 @@
 
 namespace tonewerk {
 
-// A device in the state that the test gives it; at first cool, mains powered and idle. Any thread.
+// A device in the state that the test sets; at first cool, on mains power and idle. Any thread.
 class MemorySystemInformation final : public SystemInformation {
  public:
   int thermalLevel() const override { return get(&State::thermalLevel); }

@@ -9,7 +9,7 @@
 
 namespace tonewerk {
 
-// Keeps the codes it was given and the intervals' ends, in order. Any thread.
+// Records the emitted codes and the beginnings and ends of intervals, in order. Any thread.
 //
 //   EXPECT_THAT(tracePoints.codes(), ElementsAre(0x1u, 0x2u));
 //   EXPECT_THAT(tracePoints.intervals(), ElementsAre("begin sendMessage 77", "end sendMessage 77"));

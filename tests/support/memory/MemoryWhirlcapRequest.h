@@ -10,10 +10,10 @@
 
 namespace tonewerk {
 
-// Keeps the stall traces that were requested. Any thread.
+// Records the stall traces that were requested. Any thread.
 //
 //   EXPECT_THAT(test.whirlcaps.requests(), SizeIs(1));
-//   test.whirlcaps.onRequest([&] { ... });     // a look at the world at the moment of each request
+//   test.whirlcaps.onRequest([&] { ... });     // runs at each request, to look at the state of the test
 class MemoryWhirlcapRequest final : public WhirlcapRequest {
  public:
   struct Request {

@@ -9,7 +9,7 @@
 
 namespace tonewerk {
 
-// Answers requests from a list, then with 200, and keeps them. One thread.
+// Records requests and answers them from a list, then with 200. One thread.
 class ScriptedHttpClient final : public HttpClient {
  public:
   HttpAnswer post(const HttpRequest& request) override {

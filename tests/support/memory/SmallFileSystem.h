@@ -8,8 +8,8 @@
 
 namespace tonewerk {
 
-// A file system with little room that this process and its children alone see, so that nothing of it is left
-// whatever becomes of the test. Only root can make one; threads that are to see it are started later.
+// Mounts a small file system that only this process and its children see, so that nothing of it remains,
+// however the test ends. Only root can make one. Only threads that are started later see it.
 class SmallFileSystem {
  public:
   explicit SmallFileSystem(std::string path) : path_(std::move(path)) {
@@ -24,7 +24,7 @@ class SmallFileSystem {
   }
 
   bool isMounted() const { return isMounted_; }
-  // Makes room.
+  // Enlarges the file system. Returns false when that failed.
   [[nodiscard]] bool grow() {
     return ::mount("tonewerk-test", path_.c_str(), "tmpfs", MS_REMOUNT, "size=64m") == 0;
   }
