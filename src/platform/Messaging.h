@@ -60,10 +60,10 @@ class MessagingListener {
   // Call before resume(). `delegate` outlives the listener.
   virtual void setDelegate(MessagingListenerDelegate& delegate) = 0;
 
-  // Starts to accept connections.
+  // Starts accepting connections.
   virtual void resume() = 0;
 
-  // Stops to accept connections and ends every connection. All their handlers have returned when this
+  // Stops accepting connections and ends every connection. All their handlers have returned when this
   // returns. Do not call it on the messaging thread.
   virtual void shutDown() = 0;
 };

@@ -111,7 +111,7 @@ bool suits(const Preference& preference, const Value& value) {
   return false;
 }
 
-// Writes the number without a point: all limits are whole numbers.
+// Returns the number without a point: all limits are whole numbers.
 std::string numberText(double number) { return std::to_string(static_cast<std::int64_t>(number)); }
 
 std::string rangeText(const Preference& preference) {

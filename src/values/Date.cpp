@@ -11,7 +11,7 @@ namespace tonewerk {
 std::string textOf(Date date) {
   constexpr double kFirst = -62167219200.0;  // 0000-01-01T00:00:00Z
   constexpr double kEnd =
-      253402300800.0;  // 10000-01-01T00:00:00Z; no double tells its last microsecond apart
+      253402300800.0;  // 10000-01-01T00:00:00Z; doubles near it are coarser than a microsecond
   const double seconds = std::isnan(date.seconds) ? 0.0 : std::clamp(date.seconds, kFirst, kEnd);
 
   // Computes seconds and microseconds separately: a double that holds a current date has no digits left for a

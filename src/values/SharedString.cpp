@@ -21,7 +21,8 @@ std::uint64_t wordAt(const char* at) {
 // instruction.
 std::uint64_t lastWord(std::string_view text, std::size_t count) {
   const char* end = text.data() + text.size();
-  if (text.size() >= sizeof(std::uint64_t)) return wordAt(end - sizeof(std::uint64_t));  // some bytes twice
+  if (text.size() >= sizeof(std::uint64_t))
+    return wordAt(end - sizeof(std::uint64_t));  // reads some bytes twice
   if (count >= sizeof(std::uint32_t)) {
     std::uint32_t first = 0;
     std::uint32_t last = 0;

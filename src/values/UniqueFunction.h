@@ -46,7 +46,7 @@ class UniqueFunction<Result(Arguments...)> {
   std::unique_ptr<Base> held_;
 };
 
-// A piece of work for a queue.
+// A piece of work that a queue or a thread runs.
 using Task = UniqueFunction<void()>;
 
 }  // namespace tonewerk
