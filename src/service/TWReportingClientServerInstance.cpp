@@ -289,22 +289,22 @@ void TWReportingClientServerInstance::handleConnectionError() {
 }
 
 std::optional<double> TWReportingClientServerInstance::clientStartDate() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return clientStartDate_;
 }
 
 void TWReportingClientServerInstance::setClientStartDate(double date) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   clientStartDate_ = date;
 }
 
 std::optional<std::string> TWReportingClientServerInstance::clientProcessName() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return clientProcessName_;
 }
 
 void TWReportingClientServerInstance::setClientProcessName(std::optional<std::string> name) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   clientProcessName_ = std::move(name);
 }
 

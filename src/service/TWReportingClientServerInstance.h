@@ -6,7 +6,6 @@
 #include <cstdint>
 #include <map>
 #include <memory>
-#include <mutex>
 #include <optional>
 #include <string>
 
@@ -14,6 +13,7 @@
 #include "protocol/AudioEvent.h"
 #include "service/TWReportingServiceProtocol.h"
 #include "session/KeptBytesBudget.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -97,9 +97,9 @@ class TWReportingClientServerInstance final
   SessionMap clientReportingSessionMap_;
   std::atomic<bool> isOnlooker_ = false;
 
-  mutable std::mutex mutex_;
-  std::optional<double> clientStartDate_;         // guarded by mutex_
-  std::optional<std::string> clientProcessName_;  // guarded by mutex_
+  mutable Mutex mutex_;
+  std::optional<double> clientStartDate_ GUARDED_BY(mutex_);
+  std::optional<std::string> clientProcessName_ GUARDED_BY(mutex_);
 };
 
 }  // namespace tonewerk

@@ -49,7 +49,7 @@ bool TWReportingService::listenerShouldAcceptNewConnection(MessagingConnection& 
   infoLog(category(), "newConnection: %@", connection);
   std::weak_ptr<TWReportingClientServerInstance> weakClient;
   {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     auto client = std::make_shared<TWReportingClientServerInstance>(processIdentifier, weak_from_this());
     weakClient = client;
     TWReportingUtilityGetReportingServerQueue().async([this, self = weak_from_this(), weakClient] {
@@ -95,7 +95,7 @@ void TWReportingService::reportClientUptime(
 }
 
 TWReportingService::Session TWReportingService::findReportingSessionForID(ReporterID reporterID) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   if (reporterID == 0 || !reportingEnabled_) return nullptr;
   for (const Client& client : clients_) {
     const auto& sessions = client->clientReportingSessionMap();
@@ -143,7 +143,7 @@ std::vector<TWReportingService::Session> TWReportingService::findReportingSessio
 }
 
 TWReportingService::Session TWReportingService::singleMessageSession() {
-  const std::lock_guard lock(singleMessageMutex_);
+  const MutexLock lock(singleMessageMutex_);
   if (singleMessageSession_ == nullptr) {
     infoLog(category(), "Creating singleMessageSession");
     singleMessageSession_ = makeSingleMessageSession();
@@ -159,7 +159,7 @@ TWReportingService::Session TWReportingService::singleMessageSession() {
 }
 
 TWReportingService::Session TWReportingService::currentSingleMessageSession() const {
-  const std::lock_guard lock(singleMessageMutex_);
+  const MutexLock lock(singleMessageMutex_);
   return singleMessageSession_;
 }
 
@@ -176,7 +176,7 @@ TWReportingService::Session TWReportingService::makeSingleMessageSession() {
 }
 
 void TWReportingService::_reapSingleMessageSession() {
-  const std::lock_guard lock(singleMessageMutex_);
+  const MutexLock lock(singleMessageMutex_);
   if (singleMessageSession_ == nullptr || !singleMessageSessionLastRetrieved_) return;
   const double elapsed = now() - *singleMessageSessionLastRetrieved_;
   if (!(kSingleMessageSessionTimeoutSeconds < elapsed)) {
@@ -194,7 +194,7 @@ void TWReportingService::_reapSingleMessageSession() {
 void TWReportingService::stopSingleMessageSession() {
   Session session;
   {
-    const std::lock_guard lock(singleMessageMutex_);
+    const MutexLock lock(singleMessageMutex_);
     singleMessageSessionReaper_.reset();
     session = std::exchange(singleMessageSession_, nullptr);
   }

@@ -4,7 +4,6 @@
 #include <atomic>
 #include <functional>
 #include <memory>
-#include <mutex>
 #include <optional>
 #include <vector>
 
@@ -12,6 +11,7 @@
 #include "platform/TimerService.h"
 #include "service/MessageTap.h"
 #include "service/TWReportingServiceDelegateProtocol.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -69,12 +69,13 @@ class TWReportingService final : public MessagingListenerDelegate,
   std::vector<Client> clients_;  // in order of connection; on the work queue
   MessageTap messageTap_;        // likewise
 
-  std::mutex mutex_;  // guards the making of a client and every search for a session
+  Mutex mutex_;  // held while a client is made and while a session is searched for; guards no member
 
-  mutable std::mutex singleMessageMutex_;  // guards what follows
-  Session singleMessageSession_;
-  std::optional<double> singleMessageSessionLastRetrieved_;  // seconds since 1970
-  std::unique_ptr<Timer> singleMessageSessionReaper_;
+  mutable Mutex singleMessageMutex_;
+  Session singleMessageSession_ GUARDED_BY(singleMessageMutex_);
+  // Seconds since 1970.
+  std::optional<double> singleMessageSessionLastRetrieved_ GUARDED_BY(singleMessageMutex_);
+  std::unique_ptr<Timer> singleMessageSessionReaper_ GUARDED_BY(singleMessageMutex_);
 };
 
 }  // namespace tonewerk

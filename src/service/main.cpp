@@ -9,7 +9,6 @@
 #include <initializer_list>
 #include <iostream>
 #include <memory>
-#include <mutex>
 #include <pthread.h>
 #include <string>
 #include <string_view>
@@ -43,6 +42,7 @@
 #include "service/TWReportingService.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingUtility.h"
+#include "values/Mutex.h"
 #include "workers/TWReportingWorkerClasses.h"
 
 namespace tonewerk {
@@ -182,7 +182,7 @@ class Daemon {
 
   // No session stops; what the sinks already have is written.
   [[noreturn]] void endOnKillRequest() {
-    const std::lock_guard lock(killMutex_);
+    const MutexLock lock(killMutex_);
     manager_.tellStopping("Killed by a client; finishing reports");
     flushSinks();
     ::_exit(kKilled);
@@ -215,7 +215,7 @@ class Daemon {
   std::shared_ptr<TWReportingService> service_;
   UnixSocketListener listener_;
   DbusListener dbusListener_;
-  std::mutex killMutex_;                              // two front ends may get the request at once
+  Mutex killMutex_;                                   // two front ends may get the request at once
   std::unique_ptr<DirectoryWatcher> runtimeWatcher_;  // last: it calls us
 };
 

@@ -8,12 +8,12 @@ SingletonRegistry::~SingletonRegistry() {
 }
 
 SingletonRegistry::Slot& SingletonRegistry::slotOf(std::type_index type) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return slots_[type];
 }
 
 void SingletonRegistry::keep(Slot& slot, std::shared_ptr<void> object) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   slot.object = object.get();
   objects_.push_back(std::move(object));
 }

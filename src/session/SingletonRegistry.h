@@ -9,6 +9,8 @@
 #include <utility>
 #include <vector>
 
+#include "values/Mutex.h"
+
 namespace tonewerk {
 
 // The objects of which a process has one but which session/ does not know: those of the workers, the monitor
@@ -47,9 +49,10 @@ class SingletonRegistry {
   Slot& slotOf(std::type_index type);
   void keep(Slot& slot, std::shared_ptr<void> object);
 
-  std::mutex mutex_;                            // guards what follows
-  std::map<std::type_index, Slot> slots_;       // a slot keeps its place
-  std::vector<std::shared_ptr<void>> objects_;  // in the order in which they were made
+  Mutex mutex_;
+  std::map<std::type_index, Slot> slots_ GUARDED_BY(mutex_);  // a slot keeps its place
+  // In the order in which they were made.
+  std::vector<std::shared_ptr<void>> objects_ GUARDED_BY(mutex_);
 };
 
 }  // namespace tonewerk

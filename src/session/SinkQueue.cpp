@@ -11,8 +11,8 @@ SinkQueue::~SinkQueue() { queue_.reset(); }
 
 void SinkQueue::submit(std::size_t bytes, Task work) {
   {
-    std::unique_lock lock(mutex_);
-    roomMade_.wait(lock, [&] { return waitingBytes_ == 0 || waitingBytes_ + bytes <= kMaxWaitingBytes; });
+    MutexLock lock(mutex_);
+    while (!hasRoomFor(bytes)) roomMade_.wait(lock);
     waitingBytes_ += bytes;
   }
   queue_->async([this, bytes, work = std::move(work)]() mutable {
@@ -28,10 +28,14 @@ void SinkQueue::drain() { queue_->drain(); }
 
 bool SinkQueue::isCurrent() const { return queue_->isCurrent(); }
 
+bool SinkQueue::hasRoomFor(std::size_t bytes) const {
+  return waitingBytes_ == 0 || waitingBytes_ + bytes <= kMaxWaitingBytes;
+}
+
 void SinkQueue::finished(std::size_t bytes) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   waitingBytes_ -= bytes;
-  roomMade_.notify_all();
+  roomMade_.notifyAll();
 }
 
 }  // namespace tonewerk

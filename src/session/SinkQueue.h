@@ -1,12 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <condition_variable>
 #include <cstddef>
 #include <memory>
-#include <mutex>
 
 #include "platform/SerialQueue.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -35,11 +34,12 @@ class SinkQueue {
   bool isCurrent() const;
 
  private:
+  bool hasRoomFor(std::size_t bytes) const REQUIRES(mutex_);
   void finished(std::size_t bytes);
 
-  std::mutex mutex_;
-  std::condition_variable roomMade_;
-  std::size_t waitingBytes_ = 0;  // guarded by mutex_
+  Mutex mutex_;
+  Condition roomMade_;
+  std::size_t waitingBytes_ GUARDED_BY(mutex_) = 0;
   std::unique_ptr<SerialQueue> queue_;
 };
 

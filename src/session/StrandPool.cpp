@@ -2,11 +2,11 @@
 #include "session/StrandPool.h"
 
 #include <cassert>
-#include <mutex>
 #include <set>
 #include <utility>
 
 #include "session/SinkQueue.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 namespace {
@@ -17,15 +17,15 @@ constexpr std::size_t kPieceBytes = 256;
 }  // namespace
 
 struct StrandPool::Shared {
-  std::mutex mutex;             // guards all below
-  SinkQueue* thread = nullptr;  // null when it is gone
-  std::set<Strand*> holding;    // queues that hold pieces
-  std::size_t heldBytes = 0;
-  std::size_t heldCount = 0;
-  std::uint64_t droppedCount = 0;
+  Mutex mutex;
+  SinkQueue* thread GUARDED_BY(mutex) = nullptr;  // null when it is gone
+  std::set<Strand*> holding GUARDED_BY(mutex);    // queues that hold pieces
+  std::size_t heldBytes GUARDED_BY(mutex) = 0;
+  std::size_t heldCount GUARDED_BY(mutex) = 0;
+  std::uint64_t droppedCount GUARDED_BY(mutex) = 0;
 
   bool keep(Strand& queue, std::size_t bytes) {
-    const std::lock_guard lock(mutex);
+    const MutexLock lock(mutex);
     if (heldBytes + bytes > kMaxHeldBytes) {
       ++droppedCount;
       return false;
@@ -37,7 +37,7 @@ struct StrandPool::Shared {
   }
 
   void give(Strand& queue, std::size_t bytes, std::size_t count, bool isEmpty) {
-    const std::lock_guard lock(mutex);
+    const MutexLock lock(mutex);
     heldBytes -= bytes;
     heldCount -= count;
     if (isEmpty) holding.erase(&queue);
@@ -46,13 +46,14 @@ struct StrandPool::Shared {
 
 StrandPool::StrandPool(std::unique_ptr<SerialQueue> thread)
     : shared_(std::make_shared<Shared>()), thread_(std::make_unique<SinkQueue>(std::move(thread))) {
+  const MutexLock lock(shared_->mutex);
   shared_->thread = thread_.get();
 }
 
 StrandPool::~StrandPool() {
   thread_->drain();
   {
-    const std::lock_guard lock(shared_->mutex);
+    const MutexLock lock(shared_->mutex);
     shared_->thread = nullptr;
   }
   thread_.reset();
@@ -60,7 +61,7 @@ StrandPool::~StrandPool() {
   for (;;) {
     std::shared_ptr<Strand> queue;
     {
-      const std::lock_guard lock(shared_->mutex);
+      const MutexLock lock(shared_->mutex);
       if (shared_->holding.empty()) return;
       queue = (*shared_->holding.begin())->weak_from_this().lock();
       shared_->holding.erase(shared_->holding.begin());
@@ -74,12 +75,12 @@ std::shared_ptr<Strand> StrandPool::makeQueue() { return std::make_shared<Strand
 void StrandPool::drain() { thread_->drain(); }
 
 std::uint64_t StrandPool::droppedCount() const {
-  const std::lock_guard lock(shared_->mutex);
+  const MutexLock lock(shared_->mutex);
   return shared_->droppedCount;
 }
 
 std::size_t StrandPool::heldCount() const {
-  const std::lock_guard lock(shared_->mutex);
+  const MutexLock lock(shared_->mutex);
   return shared_->heldCount;
 }
 
@@ -90,7 +91,7 @@ Strand::~Strand() { takeHeld(); }
 void Strand::submit(std::size_t bytes, Task work) {
   SinkQueue* thread = nullptr;
   {
-    const std::lock_guard lock(shared_->mutex);
+    const MutexLock lock(shared_->mutex);
     thread = shared_->thread;
   }
   assert(thread != nullptr);
@@ -101,7 +102,7 @@ void Strand::submit(std::size_t bytes, Task work) {
 
 void Strand::interrupt(Task work) {
   {
-    const std::lock_guard lock(shared_->mutex);
+    const MutexLock lock(shared_->mutex);
     if (shared_->thread == nullptr) return;
     if (!shared_->thread->isCurrent()) {
       shared_->thread->post(std::move(work));

@@ -2,6 +2,7 @@
 #include "session/TWReportingSession.h"
 
 #include <algorithm>
+#include <mutex>
 
 #include "platform/Clock.h"
 #include "platform/Log.h"
@@ -58,6 +59,7 @@ TWReportingSession::~TWReportingSession() {
 }
 
 std::size_t TWReportingSession::keptBytes() const {
+  const MutexLock lock(propertiesMutex_);
   return messageBytes_ + configuration_.bytes() + previousValues_.bytes();
 }
 
@@ -81,6 +83,7 @@ bool TWReportingSession::updateConfigurationWithContentsOfConfiguration(const Va
     update.set(TWReportingApplicationName, *name);
   }
   update.merge(*configuration);
+  const MutexLock lock(propertiesMutex_);
   return mergeWithinBudget(configuration_, update);
 }
 
@@ -114,7 +117,7 @@ void TWReportingSession::makeWorker(const TWReportingSessionWorkerClass& workerC
              workerClass, reporterID_);
     return;
   }
-  if (contains(initializedWorkerClasses_, workerClass)) {
+  if (hasWorkerOf(workerClass)) {
     debugLog(TWReportingSessionCategory(),
              "TWReportingSessionWorker already initialized. action=skipped worker=%@ reporterID=%lli",
              workerClass, reporterID_);
@@ -132,7 +135,7 @@ void TWReportingSession::makeWorker(const TWReportingSessionWorkerClass& workerC
     return;
   }
   {
-    const std::lock_guard lock(propertiesMutex_);
+    const MutexLock lock(propertiesMutex_);
     initializedWorkerClasses_.push_back(&workerClass);
     messageWorkers_.push_back(worker);
     if (workerClass.isConsumer) consumingMessageWorkers_.push_back(worker);
@@ -143,6 +146,11 @@ void TWReportingSession::makeWorker(const TWReportingSessionWorkerClass& workerC
   }
   debugLog(TWReportingSessionCategory(), "TWReportingSessionWorker action=added worker=%@ reporterID=%lli",
            workerClass, reporterID_);
+}
+
+bool TWReportingSession::hasWorkerOf(const TWReportingSessionWorkerClass& workerClass) const {
+  const MutexLock lock(propertiesMutex_);
+  return contains(initializedWorkerClasses_, workerClass);
 }
 
 void TWReportingSession::startWorker(TWReportingSessionWorkerProtocol& worker) {
@@ -157,6 +165,7 @@ void TWReportingSession::startWorker(TWReportingSessionWorkerProtocol& worker) {
 // Each worker once, at its first place.
 TWReportingSession::Workers TWReportingSession::workersInOrder(Order order) const {
   const bool consumersFirst = order == Order::kConsumersFirst;
+  const MutexLock lock(propertiesMutex_);
   Workers ordered = consumersFirst ? consumingMessageWorkers_ : producingMessageWorkers_;
   const auto addMissing = [&ordered](const Workers& more) {
     for (const auto& worker : more) {
@@ -182,7 +191,7 @@ void TWReportingSession::sendMessage(const std::shared_ptr<TWReportingSessionMes
   debugLog(
       TWReportingSessionCategory(),
       "TWReportingSessionWorker action=sendMessage reporterID=%lli app=%@ redundant=%@ message=%@",
-      reporterID_, [&] { return TWReportingUtilityRetrieveAppName(configuration_).string(); },
+      reporterID_, [&] { return TWReportingUtilityRetrieveAppName(configuration()).string(); },
       yesOrNo(message->isRedundant), *message);
   addPreviousValues(message->message);
   if (!message->isRedundant && !store(message)) ++unkeptMessageCount_;
@@ -264,7 +273,6 @@ bool TWReportingSession::mergeWithinBudget(ValueMap& map, const ValueMap& more) 
   // A merge adds at most what it merges; what it replaced is given back.
   const std::size_t before = map.bytes();
   if (!budget_->take(more.bytes())) return false;
-  const std::lock_guard lock(propertiesMutex_);
   map.merge(more);
   budget_->give(before + more.bytes() - map.bytes());
   return true;
@@ -325,7 +333,7 @@ void TWReportingSession::addAppName(TWReportingSessionMessage& message) const {
   const std::lock_guard lock(message);
   const Value* name = message.message.find(TWReportingApplicationName);
   if (name != nullptr && !(*name == kUnknownName)) return;
-  message.message.set(TWReportingApplicationName, TWReportingUtilityRetrieveAppName(configuration_));
+  message.message.set(TWReportingApplicationName, TWReportingUtilityRetrieveAppName(configuration()));
 }
 
 bool TWReportingSession::messageIsRedundant(const TWReportingSessionMessage& message) const {
@@ -344,46 +352,55 @@ const std::vector<const TWReportingSessionWorkerClass*>& TWReportingSession::get
 }
 
 std::optional<std::string> TWReportingSession::clientProcessName() const {
-  const std::lock_guard lock(propertiesMutex_);
+  const MutexLock lock(propertiesMutex_);
   return clientProcessName_;
 }
 
 void TWReportingSession::setClientProcessName(std::optional<std::string> name) {
-  const std::lock_guard lock(propertiesMutex_);
+  const MutexLock lock(propertiesMutex_);
   clientProcessName_ = std::move(name);
 }
 
 ValueMap TWReportingSession::configuration() const {
-  const std::lock_guard lock(propertiesMutex_);
+  const MutexLock lock(propertiesMutex_);
   return configuration_;
 }
 
 ValueMap TWReportingSession::previousValues() const {
-  const std::lock_guard lock(propertiesMutex_);
+  const MutexLock lock(propertiesMutex_);
   return previousValues_;
 }
 
 void TWReportingSession::addPreviousValues(const ValueMap& values) {
-  if (!mergeWithinBudget(previousValues_, values)) sayOnceThatNoMoreIsKept();
+  {
+    const MutexLock lock(propertiesMutex_);
+    if (mergeWithinBudget(previousValues_, values)) return;
+  }
+  sayOnceThatNoMoreIsKept();
+}
+
+std::size_t TWReportingSession::workerInstanceCount() const {
+  const MutexLock lock(propertiesMutex_);
+  return messageWorkers_.size();
 }
 
 TWReportingSession::Workers TWReportingSession::messageWorkers() const {
-  const std::lock_guard lock(propertiesMutex_);
+  const MutexLock lock(propertiesMutex_);
   return messageWorkers_;
 }
 
 TWReportingSession::Workers TWReportingSession::consumingMessageWorkers() const {
-  const std::lock_guard lock(propertiesMutex_);
+  const MutexLock lock(propertiesMutex_);
   return consumingMessageWorkers_;
 }
 
 TWReportingSession::Workers TWReportingSession::producingMessageWorkers() const {
-  const std::lock_guard lock(propertiesMutex_);
+  const MutexLock lock(propertiesMutex_);
   return producingMessageWorkers_;
 }
 
 std::vector<const TWReportingSessionWorkerClass*> TWReportingSession::initializedWorkerClasses() const {
-  const std::lock_guard lock(propertiesMutex_);
+  const MutexLock lock(propertiesMutex_);
   return initializedWorkerClasses_;
 }
 

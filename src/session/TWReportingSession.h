@@ -6,7 +6,6 @@
 #include <functional>
 #include <map>
 #include <memory>
-#include <mutex>
 #include <optional>
 #include <string>
 #include <utility>
@@ -17,6 +16,7 @@
 #include "session/KeptBytesBudget.h"
 #include "session/TWReportingSessionMessage.h"
 #include "session/TWReportingSessionWorkerClass.h"
+#include "values/Mutex.h"
 #include "values/Value.h"
 
 namespace tonewerk {
@@ -115,7 +115,7 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   Workers consumingMessageWorkers() const;
   Workers producingMessageWorkers() const;
   std::vector<const TWReportingSessionWorkerClass*> initializedWorkerClasses() const;
-  std::size_t workerInstanceCount() const { return messageWorkers_.size(); }
+  std::size_t workerInstanceCount() const;
 
   std::string description() const;
 
@@ -129,6 +129,7 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   std::shared_ptr<TWReportingSessionMessage> lifecycleMessage(AudioEventType type,
                                                               const std::string& method) const;
   void makeWorker(const TWReportingSessionWorkerClass& workerClass);
+  bool hasWorkerOf(const TWReportingSessionWorkerClass& workerClass) const;
   void startWorker(TWReportingSessionWorkerProtocol& worker);
   Workers workersInOrder(Order order) const;
   void deliver(const TWReportingSessionMessage& message);
@@ -138,7 +139,7 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   bool store(const std::shared_ptr<TWReportingSessionMessage>& message);
   void rememberAsNewest(const TWReportingSessionMessage& message);
   // Adds `more` to `map` when the budget has room for it.
-  bool mergeWithinBudget(ValueMap& map, const ValueMap& more);
+  bool mergeWithinBudget(ValueMap& map, const ValueMap& more) REQUIRES(propertiesMutex_);
   void sayOnceThatNoMoreIsKept();
   void forgetMessages();
 
@@ -161,15 +162,15 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   std::uint64_t unkeptMessageCount_ = 0;  // delivered, for want of room not stored, and not yet said
   std::vector<Consumer> consumers_;       // consumingMessageWorkers_ under their consumer face
 
-  // Written on the work queue, under this lock; read there without, elsewhere with it.
-  mutable std::mutex propertiesMutex_;
-  std::optional<std::string> clientProcessName_;
-  ValueMap configuration_;
-  ValueMap previousValues_;
-  Workers messageWorkers_;
-  Workers consumingMessageWorkers_;
-  Workers producingMessageWorkers_;
-  std::vector<const TWReportingSessionWorkerClass*> initializedWorkerClasses_;
+  // The properties that any thread may read. Only the work queue writes them.
+  mutable Mutex propertiesMutex_;
+  std::optional<std::string> clientProcessName_ GUARDED_BY(propertiesMutex_);
+  ValueMap configuration_ GUARDED_BY(propertiesMutex_);
+  ValueMap previousValues_ GUARDED_BY(propertiesMutex_);
+  Workers messageWorkers_ GUARDED_BY(propertiesMutex_);
+  Workers consumingMessageWorkers_ GUARDED_BY(propertiesMutex_);
+  Workers producingMessageWorkers_ GUARDED_BY(propertiesMutex_);
+  std::vector<const TWReportingSessionWorkerClass*> initializedWorkerClasses_ GUARDED_BY(propertiesMutex_);
 };
 
 }  // namespace tonewerk

@@ -97,11 +97,12 @@ SharedString TWReportingUtilityRetrieveAppName(const ValueMap& configuration) {
 bool TWReportingUtilityWait(TWReportingCondition& condition, double timeoutSeconds, const bool* flag,
                             std::string_view waitingText, std::string_view timeoutText,
                             LogCategory* category) {
-  const std::chrono::duration<double> timeout(timeoutSeconds);
-  std::unique_lock lock(condition.mutex);
+  const auto timeout =
+      std::chrono::ceil<std::chrono::steady_clock::duration>(std::chrono::duration<double>(timeoutSeconds));
+  MutexLock lock(condition.mutex);
   while (!*flag) {
     infoLog(category, "%@", waitingText);
-    if (condition.signalled.wait_for(lock, timeout) == std::cv_status::timeout) {
+    if (!condition.signalled.waitUntil(lock, std::chrono::steady_clock::now() + timeout)) {
       errorLog(category, "%@", timeoutText);
       return false;
     }
@@ -111,9 +112,9 @@ bool TWReportingUtilityWait(TWReportingCondition& condition, double timeoutSecon
 }
 
 void TWReportingUtilitySignal(TWReportingCondition& condition, bool* flag) {
-  const std::lock_guard lock(condition.mutex);
+  const MutexLock lock(condition.mutex);
   *flag = true;
-  condition.signalled.notify_one();
+  condition.signalled.notifyOne();
 }
 
 bool TWReportingUtilityIsInternalBuild() { return TWReportingContext::current().isInternalBuild(); }

@@ -2,8 +2,6 @@
 #pragma once
 
 #include <array>
-#include <condition_variable>
-#include <mutex>
 #include <optional>
 #include <span>
 #include <string>
@@ -12,6 +10,7 @@
 #include "platform/Log.h"
 #include "protocol/AudioEvent.h"
 #include "protocol/EventTexts.h"
+#include "values/Mutex.h"
 #include "values/Value.h"
 
 namespace tonewerk {
@@ -64,8 +63,8 @@ SharedString TWReportingUtilityRetrieveAppName(const ValueMap& configuration);
 
 // What TWReportingUtilityWait() waits on.
 struct TWReportingCondition {
-  std::mutex mutex;
-  std::condition_variable signalled;
+  Mutex mutex;
+  Condition signalled;
 };
 
 // Waits until `*flag` is true, at most `timeoutSeconds` a round; true when it is. The flag belongs to the

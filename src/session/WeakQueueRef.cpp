@@ -7,7 +7,7 @@ namespace tonewerk {
 
 bool WeakQueueRef::run(Task work) {
   {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     if (queue_ == nullptr) return false;
     if (!queue_->isCurrent()) {
       queue_->async(std::move(work));
@@ -20,7 +20,7 @@ bool WeakQueueRef::run(Task work) {
 }
 
 void WeakQueueRef::close() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   queue_ = nullptr;
 }
 

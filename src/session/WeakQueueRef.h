@@ -1,9 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <mutex>
-
 #include "platform/SerialQueue.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -26,8 +25,8 @@ class WeakQueueRef {
   void close();
 
  private:
-  std::mutex mutex_;
-  SerialQueue* queue_;  // guarded by mutex_; null when closed
+  Mutex mutex_;
+  SerialQueue* queue_ GUARDED_BY(mutex_);  // null when closed
 };
 
 }  // namespace tonewerk

@@ -282,8 +282,8 @@ TEST_F(TWReportingUtilityTest, WaitGoesOnWaitingWhenItIsWokenWithoutTheFlag) {
   });
   while (test.log.textsOf("twrt").empty()) std::this_thread::yield();
   {
-    const std::lock_guard lock(condition.mutex);  // taken only once the waiter waits
-    condition.signalled.notify_one();
+    const MutexLock lock(condition.mutex);  // taken only once the waiter waits
+    condition.signalled.notifyOne();
   }
   while (test.log.textsOf("twrt").size() < 2) std::this_thread::yield();
   EXPECT_EQ(test.log.textsOf("twrt")[1], "continuing");
