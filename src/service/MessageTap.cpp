@@ -2,12 +2,15 @@
 #include "service/MessageTap.h"
 
 #include <algorithm>
+#include <cassert>
 
 #include "service/TapSubscriber.h"
+#include "session/TWReportingUtility.h"
 
 namespace tonewerk {
 
 void MessageTap::add(const std::shared_ptr<TapSubscriber>& watcher) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto isListed = [&](const auto& listed) { return listed.lock() == watcher; };
   if (std::none_of(watchers_.begin(), watchers_.end(), isListed)) watchers_.push_back(watcher);
 }

@@ -1,8 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <cassert>
 #include <memory>
 #include <vector>
+
+#include "session/TWReportingUtility.h"
 
 namespace tonewerk {
 
@@ -19,6 +22,7 @@ class MessageTap {
 
   // `message` has been received, judged and delivered by `session`.
   void note(const TWReportingSession& session, const TWReportingSessionMessage& message) {
+    assert(TWReportingUtilityIsOnReportingServerQueue());
     if (!watchers_.empty()) offer(session, message);
   }
 

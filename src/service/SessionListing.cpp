@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "service/SessionListing.h"
 
+#include <cassert>
 #include <chrono>
 #include <memory>
 #include <optional>
@@ -73,6 +74,7 @@ void Portion::add(const TWReportingSession& session, const std::optional<std::st
 }  // namespace
 
 ValueMap sessionListing(const TWReportingServiceDelegateProtocol& service, std::size_t first) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   Portion portion(first);
   for (const auto& client : service.getAllClients()) {
     const auto& sessions = client->clientReportingSessionMap();

@@ -2,6 +2,7 @@
 #include "service/TWReportingClientServerInstance.h"
 
 #include <algorithm>
+#include <cassert>
 #include <utility>
 #include <vector>
 
@@ -255,6 +256,7 @@ void TWReportingClientServerInstance::observe(ServiceRequest request) {
 
 TWReportingClientServerInstance::Session TWReportingClientServerInstance::findReportingSessionForID(
     ReporterID reporterID, bool acrossAllClients) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   if (Session own = ownSession(reporterID)) return own;
   const Delegate delegate = acrossAllClients ? delegate_.lock() : nullptr;
   return delegate == nullptr ? nullptr : delegate->findReportingSessionForID(reporterID);
@@ -286,6 +288,12 @@ void TWReportingClientServerInstance::handleConnectionError() {
     logLine(self->presenceLevel(), category(), "removing %i from the server client list",
             self->processIdentifier_);
   });
+}
+
+const TWReportingClientServerInstance::SessionMap&
+TWReportingClientServerInstance::clientReportingSessionMap() const {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
+  return clientReportingSessionMap_;
 }
 
 std::optional<double> TWReportingClientServerInstance::clientStartDate() const {

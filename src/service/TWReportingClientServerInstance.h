@@ -75,7 +75,7 @@ class TWReportingClientServerInstance final
   std::optional<std::string> clientProcessName() const;
   void setClientProcessName(std::optional<std::string> name);
 
-  const SessionMap& clientReportingSessionMap() const { return clientReportingSessionMap_; }
+  const SessionMap& clientReportingSessionMap() const;
 
  private:
   using Delegate = std::shared_ptr<TWReportingServiceDelegateProtocol>;

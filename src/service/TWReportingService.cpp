@@ -2,6 +2,7 @@
 #include "service/TWReportingService.h"
 
 #include <algorithm>
+#include <cassert>
 #include <chrono>
 #include <string>
 #include <utility>
@@ -75,6 +76,16 @@ bool TWReportingService::listenerShouldAcceptNewConnection(MessagingConnection& 
   return true;
 }
 
+const std::vector<TWReportingService::Client>& TWReportingService::getAllClients() const {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
+  return clients_;
+}
+
+MessageTap& TWReportingService::messageTap() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
+  return messageTap_;
+}
+
 void TWReportingService::registerClient(const Client& client) {
   clients_.push_back(client);
   client->setClientStartDate(now());
@@ -95,6 +106,7 @@ void TWReportingService::reportClientUptime(
 }
 
 TWReportingService::Session TWReportingService::findReportingSessionForID(ReporterID reporterID) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const MutexLock lock(mutex_);
   if (reporterID == 0 || !reportingEnabled_) return nullptr;
   for (const Client& client : clients_) {
@@ -110,6 +122,7 @@ TWReportingService::Session TWReportingService::findReportingSessionForID(Report
 }
 
 std::vector<TWReportingService::Session> TWReportingService::getAllActiveReportingSessions() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   std::vector<Session> active;
   for (const Client& client : clients_) {
     const auto& sessions = client->clientReportingSessionMap();
@@ -128,6 +141,7 @@ std::vector<TWReportingService::Session> TWReportingService::getAllActiveReporti
 
 std::vector<TWReportingService::Session> TWReportingService::findReportingSessionsForIDs(
     const std::optional<std::vector<ReporterID>>& reporterIDs) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   if (reporterIDs && !reporterIDs->empty()) {
     std::vector<Session> found;
     for (const ReporterID reporterID : *reporterIDs) {
@@ -159,6 +173,7 @@ TWReportingService::Session TWReportingService::singleMessageSession() {
 }
 
 TWReportingService::Session TWReportingService::currentSingleMessageSession() const {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const MutexLock lock(singleMessageMutex_);
   return singleMessageSession_;
 }
@@ -192,6 +207,7 @@ void TWReportingService::_reapSingleMessageSession() {
 }
 
 void TWReportingService::stopSingleMessageSession() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   Session session;
   {
     const MutexLock lock(singleMessageMutex_);
@@ -202,10 +218,12 @@ void TWReportingService::stopSingleMessageSession() {
 }
 
 void TWReportingService::removeClient(const TWReportingClientServerInstance& client) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   std::erase_if(clients_, [&client](const Client& listed) { return listed.get() == &client; });
 }
 
 void TWReportingService::logReportingSessions() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const LogCategory* log = category();
   if (!log->isEnabled(LogLevel::kDebug)) return;  // the list is made for the log alone
   const std::vector<Session> active = getAllActiveReportingSessions();

@@ -41,11 +41,11 @@ class TWReportingService final : public MessagingListenerDelegate,
       const std::optional<std::vector<ReporterID>>& reporterIDs) override;
   std::vector<Session> getAllActiveReportingSessions() override;
   Session currentSingleMessageSession() const override;
-  const std::vector<Client>& getAllClients() const override { return clients_; }
+  const std::vector<Client>& getAllClients() const override;
   bool isReportingEnabled() const override { return reportingEnabled_; }
   void removeClient(const TWReportingClientServerInstance& client) override;
   void logReportingSessions() override;
-  MessageTap& messageTap() override { return messageTap_; }
+  MessageTap& messageTap() override;
   void endProcess() override { endProcess_(); }
 
   // The reaper's tick, twice a second on its thread: takes out the single-message session when it was last

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "service/TapSubscriber.h"
 
+#include <cassert>
 #include <utility>
 #include <vector>
 
@@ -16,6 +17,7 @@
 namespace tonewerk {
 
 void TapSubscriber::open(MessageFilter filter) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   isOpen_ = true;
   filter_ = std::move(filter);
   waiting_.clear();
@@ -24,6 +26,7 @@ void TapSubscriber::open(MessageFilter filter) {
 }
 
 void TapSubscriber::offer(const TWReportingSession& session, const TWReportingSessionMessage& message) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   if (!filter_.wants(session.reporterID(), message.category, message.type)) return;
   SeenMessage seen{session.reporterID(), session.serviceType(), message.category,
                    message.type,         message.isRedundant,   message.message};
@@ -57,6 +60,7 @@ TapSubscriber::SeenMessage TapSubscriber::takeOldest() {
 }
 
 void TapSubscriber::next(Reply reply, InFlightToken token) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   if (isHeld_) answerHeld();
   if (hasNews()) return reply(std::nullopt, takeAnswer());
   isHeld_ = true;

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "session/SinkQueue.h"
 
+#include <cassert>
 #include <utility>
 
 namespace tonewerk {
@@ -10,6 +11,7 @@ SinkQueue::SinkQueue(std::unique_ptr<SerialQueue> queue) : queue_(std::move(queu
 SinkQueue::~SinkQueue() { queue_.reset(); }
 
 void SinkQueue::submit(std::size_t bytes, Task work) {
+  assert(!queue_->isCurrent());  // it would wait for itself
   {
     MutexLock lock(mutex_);
     while (!hasRoomFor(bytes)) roomMade_.wait(lock);
@@ -27,6 +29,8 @@ void SinkQueue::post(Task work) { queue_->async(std::move(work)); }
 void SinkQueue::drain() { queue_->drain(); }
 
 bool SinkQueue::isCurrent() const { return queue_->isCurrent(); }
+
+bool SinkQueue::ownsThisThread() const { return queue_->ownsThisThread(); }
 
 bool SinkQueue::hasRoomFor(std::size_t bytes) const {
   return waitingBytes_ == 0 || waitingBytes_ + bytes <= kMaxWaitingBytes;

@@ -30,8 +30,9 @@ class SinkQueue {
   // Returns when everything submitted before has run.
   void drain();
 
-  // True on the thread that is running this queue's work.
+  // As SerialQueue's.
   bool isCurrent() const;
+  bool ownsThisThread() const;
 
  private:
   bool hasRoomFor(std::size_t bytes) const REQUIRES(mutex_);

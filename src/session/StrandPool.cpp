@@ -112,9 +112,18 @@ void Strand::interrupt(Task work) {
   work();
 }
 
-void Strand::hold() { isHeld_ = true; }
+void Strand::hold() {
+  assert(ownsThisThread());
+  isHeld_ = true;
+}
+
+bool Strand::isHeld() const {
+  assert(ownsThisThread());
+  return isHeld_;
+}
 
 void Strand::release() {
+  assert(ownsThisThread());
   isHeld_ = false;
   while (!isHeld_ && !held_.empty()) {
     const Piece piece = std::move(held_.front());
@@ -124,7 +133,15 @@ void Strand::release() {
   }
 }
 
-std::uint64_t Strand::takeDroppedCount() { return std::exchange(droppedCount_, 0); }
+std::uint64_t Strand::takeDroppedCount() {
+  assert(ownsThisThread());
+  return std::exchange(droppedCount_, 0);
+}
+
+bool Strand::ownsThisThread() const {
+  const MutexLock lock(shared_->mutex);
+  return shared_->thread == nullptr || shared_->thread->ownsThisThread();
+}
 
 void Strand::runOrHold(std::size_t bytes, Task work) {
   if (!isHeld_) {

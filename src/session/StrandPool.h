@@ -71,7 +71,7 @@ class Strand : public std::enable_shared_from_this<Strand> {
   // it returns; one of them may hold again.
   void hold();
   void release();
-  bool isHeld() const { return isHeld_; }
+  bool isHeld() const;
 
   // On the thread. How many pieces found no room since the last call.
   std::uint64_t takeDroppedCount();
@@ -83,6 +83,8 @@ class Strand : public std::enable_shared_from_this<Strand> {
     Task work;
   };
 
+  // Also true on any thread once StrandPool is gone. For assertions.
+  bool ownsThisThread() const;
   void runOrHold(std::size_t bytes, Task work);
   std::deque<Piece> takeHeld();
 

@@ -59,8 +59,14 @@ SerialQueue& TWReportingContext::reportingServerQueue() {
     reportingServerQueue_ = platform_.queues.makeSerialQueue("com.orvane.tonewerk.reporting.server",
                                                              QueuePriority::kUserInteractive);
     reportingServerQueueGate_ = std::make_shared<WeakQueueRef>(*reportingServerQueue_);
+    livingReportingServerQueue_ = reportingServerQueue_.get();
   });
-  return *reportingServerQueue_;
+  return *livingReportingServerQueue_;
+}
+
+bool TWReportingContext::isOnReportingServerQueue() const {
+  const SerialQueue* queue = livingReportingServerQueue_;
+  return queue == nullptr || queue->ownsThisThread();
 }
 
 std::shared_ptr<WeakQueueRef> TWReportingContext::reportingServerQueueGate() {
@@ -70,7 +76,8 @@ std::shared_ptr<WeakQueueRef> TWReportingContext::reportingServerQueueGate() {
 
 void TWReportingContext::endReportingServerQueue() {
   if (reportingServerQueueGate_ != nullptr) reportingServerQueueGate_->close();
-  reportingServerQueue_.reset();
+  reportingServerQueue_.reset();  // runs what is still queued, which may ask for the queue
+  livingReportingServerQueue_ = nullptr;
 }
 
 SinkQueue& TWReportingContext::fileSinkQueue() {

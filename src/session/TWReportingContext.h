@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <atomic>
+#include <cassert>
 #include <memory>
 #include <mutex>
 #include <optional>
@@ -45,6 +47,10 @@ class TWReportingContext {
   // The one serial queue that carries every request body, session and worker call. Made on first use.
   SerialQueue& reportingServerQueue();
 
+  // True where clients, sessions and workers may be used: on the work queue (SerialQueue::ownsThisThread()), and
+  // on any thread while there is no work queue. For assertions.
+  bool isOnReportingServerQueue() const;
+
   // The way onto it for what may come when it is gone. Closes before the queue ends.
   std::shared_ptr<WeakQueueRef> reportingServerQueueGate();
 
@@ -64,7 +70,10 @@ class TWReportingContext {
   SingletonRegistry& singles() { return singles_; }
 
   // On the work queue.
-  TWReportingNameTable& names() { return names_; }
+  TWReportingNameTable& names() {
+    assert(isOnReportingServerQueue());
+    return names_;
+  }
 
   // Values of the base categories' and the types' texts.
   using Lookup = std::unordered_map<std::string, std::uint32_t>;
@@ -114,7 +123,8 @@ class TWReportingContext {
   std::unique_ptr<StrandPool> linkReportQueues_;
   std::once_flag reportingServerQueueOnce_;
   std::unique_ptr<SerialQueue> reportingServerQueue_;
-  std::shared_ptr<WeakQueueRef> reportingServerQueueGate_;  // made with the queue
+  std::atomic<SerialQueue*> livingReportingServerQueue_ = nullptr;  // until the queue's last work has run
+  std::shared_ptr<WeakQueueRef> reportingServerQueueGate_;          // made with the queue
 };
 
 }  // namespace tonewerk

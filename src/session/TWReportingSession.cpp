@@ -2,6 +2,7 @@
 #include "session/TWReportingSession.h"
 
 #include <algorithm>
+#include <cassert>
 #include <mutex>
 
 #include "platform/Clock.h"
@@ -34,6 +35,7 @@ bool contains(const std::vector<const TWReportingSessionWorkerClass*>& classes,
 std::shared_ptr<TWReportingSession> TWReportingSession::initWithID(ReporterID reporterID,
                                                                    ProcessIdentifiers processIdentifiers,
                                                                    std::shared_ptr<KeptBytesBudget> budget) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto& registry = TWReportingContext::current().workerRegistry();
   if (budget == nullptr) budget = std::make_shared<KeptBytesBudget>();
   auto session = std::make_shared<TWReportingSession>(Private(), reporterID, std::move(processIdentifiers),
@@ -52,7 +54,7 @@ TWReportingSession::TWReportingSession(Private, ReporterID reporterID, ProcessId
       serviceName_(TWReportingUtilityGenerateServiceNameFromServiceType(kServiceUnknown)) {}
 
 TWReportingSession::~TWReportingSession() {
-  logUnkeptMessages();
+  sayHowManyWereNotKept();
   emitTracePoint(TWReportingTracePoint::kSessionReleased);
   infoLog(TWReportingSessionCategory(), "deallocing this session %lli", reporterID_);
   budget_->give(keptBytes());
@@ -64,6 +66,7 @@ std::size_t TWReportingSession::keptBytes() const {
 }
 
 void TWReportingSession::leaveBudget() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const std::size_t kept = keptBytes();
   budget_->give(kept);
   budget_ = std::make_shared<KeptBytesBudget>(kept);
@@ -71,12 +74,14 @@ void TWReportingSession::leaveBudget() {
 }
 
 void TWReportingSession::setServiceType(AudioServiceType serviceType) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   serviceType_ = serviceType;
   serviceName_ = TWReportingUtilityGenerateServiceNameFromServiceType(serviceType);
   infoLog(TWReportingSessionCategory(), "setting service type %@", serviceName_);
 }
 
 bool TWReportingSession::updateConfigurationWithContentsOfConfiguration(const ValueMap* configuration) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   if (configuration == nullptr) return true;
   ValueMap update;
   if (const Value* name = configuration->find(TWReportingQMApplicationName)) {
@@ -88,6 +93,7 @@ bool TWReportingSession::updateConfigurationWithContentsOfConfiguration(const Va
 }
 
 void TWReportingSession::start() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   store(lifecycleMessage(kTypeStart, "start"));
   infoLog(TWReportingSessionCategory(), "start called. reporterID=%lli", reporterID_);
   if (started_) {
@@ -103,6 +109,7 @@ void TWReportingSession::start() {
 
 void TWReportingSession::startWorkersFromClasses(
     const std::vector<const TWReportingSessionWorkerClass*>& classes) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   for (const TWReportingSessionWorkerClass* workerClass : classes) makeWorker(*workerClass);
   for (const auto& worker : workersInOrder(Order::kConsumersFirst)) {
     if (!worker->started) startWorker(*worker);
@@ -179,6 +186,7 @@ TWReportingSession::Workers TWReportingSession::workersInOrder(Order order) cons
 
 void TWReportingSession::sendMessage(const std::shared_ptr<TWReportingSessionMessage>& message,
                                      const MessageReply& reply) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   ++totalMessageCount_;
   addMissingDates(*message);
   removeWhiteSpaceFromKeys(*message);
@@ -215,9 +223,10 @@ void TWReportingSession::deliver(const TWReportingSessionMessage& message) {
 }
 
 void TWReportingSession::stop() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   store(lifecycleMessage(kTypeStop, "stop"));
   debugLog(TWReportingSessionCategory(), "stop called. reporterID=%lli", reporterID_);
-  if (!started_) return logUnkeptMessages();
+  if (!started_) return sayHowManyWereNotKept();
   debugLog(TWReportingSessionCategory(), "ending session. reporterID=%lli", reporterID_);
   emitTracePoint(TWReportingTracePoint::kSessionEnding);
   TWReportingSessionMessage::sortMessages(messages_);
@@ -231,7 +240,7 @@ void TWReportingSession::stop() {
     debugLog(TWReportingSessionCategory(), "TWReportingSessionWorker action=stop worker=%@ reporterID=%lli",
              worker->workerClass(), reporterID_);
   }
-  logUnkeptMessages();
+  sayHowManyWereNotKept();
   forgetMessages();
   totalMessageCount_ = 0;
   redundantMessageCount_ = 0;
@@ -288,6 +297,11 @@ void TWReportingSession::sayOnceThatNoMoreIsKept() {
 }
 
 void TWReportingSession::logUnkeptMessages() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
+  sayHowManyWereNotKept();
+}
+
+void TWReportingSession::sayHowManyWereNotKept() {
   if (unkeptMessageCount_ == 0) return;
   errorLog(TWReportingSessionCategory(), "messages delivered but not kept: count=%lu reporterID=%lli",
            std::exchange(unkeptMessageCount_, 0), reporterID_);
@@ -330,6 +344,7 @@ void TWReportingSession::addAudioMessageTag(TWReportingSessionMessage& message) 
 }
 
 void TWReportingSession::addAppName(TWReportingSessionMessage& message) const {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const std::lock_guard lock(message);
   const Value* name = message.message.find(TWReportingApplicationName);
   if (name != nullptr && !(*name == kUnknownName)) return;
@@ -337,6 +352,7 @@ void TWReportingSession::addAppName(TWReportingSessionMessage& message) const {
 }
 
 bool TWReportingSession::messageIsRedundant(const TWReportingSessionMessage& message) const {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   if (message.type == kTypeError || message.category == kCategoryError) return false;
   const auto earlier = newest_.find({message.category, message.type});
   if (earlier == newest_.end()) return false;
@@ -357,6 +373,7 @@ std::optional<std::string> TWReportingSession::clientProcessName() const {
 }
 
 void TWReportingSession::setClientProcessName(std::optional<std::string> name) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const MutexLock lock(propertiesMutex_);
   clientProcessName_ = std::move(name);
 }
@@ -372,6 +389,7 @@ ValueMap TWReportingSession::previousValues() const {
 }
 
 void TWReportingSession::addPreviousValues(const ValueMap& values) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   {
     const MutexLock lock(propertiesMutex_);
     if (mergeWithinBudget(previousValues_, values)) return;
@@ -405,6 +423,7 @@ std::vector<const TWReportingSessionWorkerClass*> TWReportingSession::initialize
 }
 
 std::string TWReportingSession::description() const {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const Value* noName = nullptr;
   const std::optional<std::string> clientName = clientProcessName();
   const std::int32_t ownerPid = processIdentifiers_.empty() ? 0 : processIdentifiers_.front();

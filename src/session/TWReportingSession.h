@@ -141,6 +141,7 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   // Adds `more` to `map` when the budget has room for it.
   bool mergeWithinBudget(ValueMap& map, const ValueMap& more) REQUIRES(propertiesMutex_);
   void sayOnceThatNoMoreIsKept();
+  void sayHowManyWereNotKept();
   void forgetMessages();
 
   const ReporterID reporterID_;

@@ -123,6 +123,10 @@ SerialQueue& TWReportingUtilityGetReportingServerQueue() {
   return TWReportingContext::current().reportingServerQueue();
 }
 
+bool TWReportingUtilityIsOnReportingServerQueue() {
+  return TWReportingContext::current().isOnReportingServerQueue();
+}
+
 LogCategory* TWReportingClientCategory() { return &TWReportingContext::current().logCategories.client; }
 LogCategory* TWReportingServiceDelegateCategory() {
   return &TWReportingContext::current().logCategories.serviceDelegate;

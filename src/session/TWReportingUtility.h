@@ -78,6 +78,8 @@ void TWReportingUtilitySignal(TWReportingCondition& condition, bool* flag);
 bool TWReportingUtilityIsInternalBuild();
 inline bool TWReportingUtilityShouldSendMessage() { return true; }
 SerialQueue& TWReportingUtilityGetReportingServerQueue();
+// True where what lives on that queue may be used, for assertions; see TWReportingContext.
+bool TWReportingUtilityIsOnReportingServerQueue();
 
 // One log category an area.
 LogCategory* TWReportingClientCategory();
