@@ -92,7 +92,7 @@ void TWReportingClientServerInstance::changeServiceType(AudioServiceType service
   // First, so that there is room for what moves on, however full the budget is.
   session->leaveBudget();
   const Session replacement = makeSession(session->reporterID());
-  replacement->updateConfigurationWithContentsOfConfiguration(&configuration);
+  (void)replacement->updateConfigurationWithContentsOfConfiguration(&configuration);  // fits, see above
   replacement->addPreviousValues(previousValues);
   replacement->setServiceType(serviceType);
   clientReportingSessionMap_[session->reporterID()] = replacement;

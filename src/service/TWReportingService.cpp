@@ -185,7 +185,7 @@ TWReportingService::Session TWReportingService::makeSingleMessageSession() {
   session->setSingleMessageSession(true);
   session->setServiceType(kServiceStandalone);
   const ValueMap configuration{{TWReportingApplicationName, "Unknown"}};
-  session->updateConfigurationWithContentsOfConfiguration(&configuration);
+  (void)session->updateConfigurationWithContentsOfConfiguration(&configuration);  // fits a budget of its own
   session->start();
   return session;
 }

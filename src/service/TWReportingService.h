@@ -34,7 +34,7 @@ class TWReportingService final : public MessagingListenerDelegate,
   ~TWReportingService() override;
 
   // Takes every connection, whoever the peer is.
-  bool listenerShouldAcceptNewConnection(MessagingConnection& connection) override;
+  [[nodiscard]] bool listenerShouldAcceptNewConnection(MessagingConnection& connection) override;
 
   Session findReportingSessionForID(ReporterID reporterID) override;
   std::vector<Session> findReportingSessionsForIDs(

@@ -30,7 +30,7 @@ class TWReportingServiceExport final : public RequestHandler {
   enum class Role { kOpen, kClient, kOnlooker };
 
   // Takes the role that goes with the method; why it cannot, or none.
-  std::optional<ReplyError> takeRole(const Method& method);
+  [[nodiscard]] std::optional<ReplyError> takeRole(const Method& method);
 
   Role role_ = Role::kOpen;  // the messaging thread's
   const std::shared_ptr<TWReportingServiceProtocol> object_;

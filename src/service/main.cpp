@@ -191,8 +191,8 @@ class Daemon {
   void flushSinks() {
     context_.fileSinkQueue().drain();
     context_.linkReportQueues().drain();
-    linkReport_.finish(kNetworkTimeout);  // what is lost is in the exporters' own log lines
-    store_.flush(kFlushTimeout);          // a failure is in the store's own log lines
+    (void)linkReport_.finish(kNetworkTimeout);  // what is lost is in the exporters' own log lines
+    (void)store_.flush(kFlushTimeout);          // a failure is in the store's own log lines
     capsa_.finish();
     diagnostics_.finish(kDiagnosticsTimeout);
   }

@@ -16,7 +16,7 @@ class KeptBytesBudget {
   bool hasRoomFor(std::size_t bytes) const { return bytes <= most_ - used_; }
 
   // Whether `bytes` more fit; takes them when they do.
-  bool take(std::size_t bytes) {
+  [[nodiscard]] bool take(std::size_t bytes) {
     if (!hasRoomFor(bytes)) return false;
     used_ += bytes;
     return true;

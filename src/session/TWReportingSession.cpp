@@ -70,7 +70,8 @@ void TWReportingSession::leaveBudget() {
   const std::size_t kept = keptBytes();
   budget_->give(kept);
   budget_ = std::make_shared<KeptBytesBudget>(kept);
-  budget_->take(kept);
+  [[maybe_unused]] const bool fits = budget_->take(kept);
+  assert(fits);
 }
 
 void TWReportingSession::setServiceType(AudioServiceType serviceType) {
@@ -94,7 +95,7 @@ bool TWReportingSession::updateConfigurationWithContentsOfConfiguration(const Va
 
 void TWReportingSession::start() {
   assert(TWReportingUtilityIsOnReportingServerQueue());
-  store(lifecycleMessage(kTypeStart, "start"));
+  (void)store(lifecycleMessage(kTypeStart, "start"));  // a start counts also when its message is not kept
   infoLog(TWReportingSessionCategory(), "start called. reporterID=%lli", reporterID_);
   if (started_) {
     infoLog(TWReportingSessionCategory(), "%lli is already started", reporterID_);
@@ -224,7 +225,7 @@ void TWReportingSession::deliver(const TWReportingSessionMessage& message) {
 
 void TWReportingSession::stop() {
   assert(TWReportingUtilityIsOnReportingServerQueue());
-  store(lifecycleMessage(kTypeStop, "stop"));
+  (void)store(lifecycleMessage(kTypeStop, "stop"));  // likewise
   debugLog(TWReportingSessionCategory(), "stop called. reporterID=%lli", reporterID_);
   if (!started_) return sayHowManyWereNotKept();
   debugLog(TWReportingSessionCategory(), "ending session. reporterID=%lli", reporterID_);

@@ -136,10 +136,10 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   // Taken from the budget.
   std::size_t keptBytes() const;
   // False when there is no room left to keep it.
-  bool store(const std::shared_ptr<TWReportingSessionMessage>& message);
+  [[nodiscard]] bool store(const std::shared_ptr<TWReportingSessionMessage>& message);
   void rememberAsNewest(const TWReportingSessionMessage& message);
   // Adds `more` to `map` when the budget has room for it.
-  bool mergeWithinBudget(ValueMap& map, const ValueMap& more) REQUIRES(propertiesMutex_);
+  [[nodiscard]] bool mergeWithinBudget(ValueMap& map, const ValueMap& more) REQUIRES(propertiesMutex_);
   void sayOnceThatNoMoreIsKept();
   void sayHowManyWereNotKept();
   void forgetMessages();

@@ -70,9 +70,9 @@ struct TWReportingCondition {
 // Waits until `*flag` is true, at most `timeoutSeconds` a round; true when it is. The flag belongs to the
 // caller and is read and written only under the condition's lock. Blocks the calling thread: never on the
 // work queue while the signaller needs that queue.
-bool TWReportingUtilityWait(TWReportingCondition& condition, double timeoutSeconds, const bool* flag,
-                            std::string_view waitingText, std::string_view timeoutText,
-                            LogCategory* category);
+[[nodiscard]] bool TWReportingUtilityWait(TWReportingCondition& condition, double timeoutSeconds,
+                                          const bool* flag, std::string_view waitingText,
+                                          std::string_view timeoutText, LogCategory* category);
 void TWReportingUtilitySignal(TWReportingCondition& condition, bool* flag);
 
 bool TWReportingUtilityIsInternalBuild();

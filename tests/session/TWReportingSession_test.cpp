@@ -86,7 +86,7 @@ TEST_F(TWReportingSessionTest, DescribesItself) {
   session->setSingleMessageSession(true);
   session->start();
   const ValueMap configuration{{"HostApplicationDisplayID", "com.orvane.player"}};
-  session->updateConfigurationWithContentsOfConfiguration(&configuration);
+  EXPECT_TRUE(session->updateConfigurationWithContentsOfConfiguration(&configuration));
   EXPECT_EQ(session->description(),
             "reporterID=77,serviceName=longformaudio,ownerPid=4711,clientProcessName=player,"
             "HostApplicationDisplayID=com.orvane.player,started=1,singleMessageSession=1");
@@ -98,19 +98,19 @@ TEST_F(TWReportingSessionTest, AddsToItsConfiguration) {
   const auto session = makeSession();
   const ValueMap first{{"a", 1}, {"b", 1}};
   const ValueMap second{{"b", 2}, {"c", 3}};
-  session->updateConfigurationWithContentsOfConfiguration(&first);
-  session->updateConfigurationWithContentsOfConfiguration(nullptr);
-  session->updateConfigurationWithContentsOfConfiguration(&second);
+  EXPECT_TRUE(session->updateConfigurationWithContentsOfConfiguration(&first));
+  EXPECT_TRUE(session->updateConfigurationWithContentsOfConfiguration(nullptr));
+  EXPECT_TRUE(session->updateConfigurationWithContentsOfConfiguration(&second));
   EXPECT_EQ(session->configuration(), (ValueMap{{"a", 1}, {"b", 2}, {"c", 3}}));
 }
 
 TEST_F(TWReportingSessionTest, TheQMApplicationNameServesUnlessTheMapNamesOneItself) {
   const auto session = makeSession();
   const ValueMap quiet{{"QMHostApplicationDisplayID", "qm"}};
-  session->updateConfigurationWithContentsOfConfiguration(&quiet);
+  EXPECT_TRUE(session->updateConfigurationWithContentsOfConfiguration(&quiet));
   EXPECT_EQ(session->configuration().text("HostApplicationDisplayID"), "qm");
   const ValueMap both{{"QMHostApplicationDisplayID", "qm2"}, {"HostApplicationDisplayID", "own"}};
-  session->updateConfigurationWithContentsOfConfiguration(&both);
+  EXPECT_TRUE(session->updateConfigurationWithContentsOfConfiguration(&both));
   EXPECT_EQ(session->configuration().text("HostApplicationDisplayID"), "own");
   EXPECT_EQ(session->configuration().text("QMHostApplicationDisplayID"), "qm2");
 }
@@ -287,7 +287,7 @@ TEST_F(TWReportingSessionTest, AMessageWithoutAnApplicationGetsTheSessions) {
   };
   EXPECT_EQ(nameAfter({}), "Unknown");
   const ValueMap configuration{{"HostApplicationDisplayID", "com.orvane.player"}};
-  session->updateConfigurationWithContentsOfConfiguration(&configuration);
+  EXPECT_TRUE(session->updateConfigurationWithContentsOfConfiguration(&configuration));
   EXPECT_EQ(nameAfter({}), "com.orvane.player");
   EXPECT_EQ(nameAfter({{"HostApplicationDisplayID", "Unknown"}}), "com.orvane.player");
   EXPECT_EQ(nameAfter({{"HostApplicationDisplayID", "unknown"}}), "unknown");

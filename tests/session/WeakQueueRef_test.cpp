@@ -29,7 +29,7 @@ TEST(WeakQueueRefTest, TheQueuesOwnWorkIsServedAtOnceAlsoFromWithin) {
   WeakQueueRef gate(queue);
   int depth = 0;
   queue.async([&] {
-    gate.run([&] { gate.run([&] { depth = 2; }); });
+    EXPECT_TRUE(gate.run([&] { EXPECT_TRUE(gate.run([&] { depth = 2; })); }));
     EXPECT_EQ(depth, 2);
   });
   queue.runAll();
@@ -73,7 +73,7 @@ class ContextGateTest : public ReportingTest {};
 TEST_F(ContextGateTest, TheContextsGateLeadsToTheWorkQueueAndClosesWithTheContext) {
   const std::shared_ptr<WeakQueueRef> gate = context->reportingServerQueueGate();
   bool wasOnTheQueue = false;
-  gate->run([&] { wasOnTheQueue = context->reportingServerQueue().isCurrent(); });
+  EXPECT_TRUE(gate->run([&] { wasOnTheQueue = context->reportingServerQueue().isCurrent(); }));
   test.queues.runAll();
   EXPECT_TRUE(wasOnTheQueue);
 
