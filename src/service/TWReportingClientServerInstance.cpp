@@ -27,7 +27,7 @@ const auto category = &TWReportingServiceDelegateCategory;
 
 ReplyError overBudget(const KeptBytesBudget& budget) {
   return messagingError(kOverLimit, "the connection's sessions keep " + std::to_string(budget.used()) +
-                                        " bytes, the most is " + std::to_string(budget.most()));
+                                        " bytes, the most is " + std::to_string(budget.limit()));
 }
 
 }  // namespace

@@ -5,29 +5,30 @@
 
 namespace tonewerk {
 
-// How much the sessions of one client may keep together: messages, previous values, configurations. On the
-// work queue.
+// Limits how many bytes the sessions of one client keep together: messages, previous values and
+// configurations. Used on the work queue.
 class KeptBytesBudget {
  public:
   static constexpr std::size_t kMaxKeptBytes = std::size_t{256} << 20;
 
-  explicit KeptBytesBudget(std::size_t mostBytes = kMaxKeptBytes) : most_(mostBytes) {}
+  explicit KeptBytesBudget(std::size_t limitBytes = kMaxKeptBytes) : limit_(limitBytes) {}
 
-  bool hasRoomFor(std::size_t bytes) const { return bytes <= most_ - used_; }
+  bool hasRoomFor(std::size_t bytes) const { return bytes <= limit_ - used_; }
 
-  // Whether `bytes` more fit; takes them when they do.
+  // Takes `bytes`. Returns false, and takes nothing, when they do not fit.
   [[nodiscard]] bool take(std::size_t bytes) {
     if (!hasRoomFor(bytes)) return false;
     used_ += bytes;
     return true;
   }
-  // Gives back what was taken.
+  // Gives back bytes that were taken.
   void give(std::size_t bytes) { used_ -= bytes; }
 
   std::size_t used() const { return used_; }
-  std::size_t most() const { return most_; }
+  std::size_t limit() const { return limit_; }
 
-  // True the first time, so that a client over its budget is told of once.
+  // Returns true on the first call only. The caller logs then, so that each client over its budget is
+  // logged once.
   bool isFirstRefusal() {
     const bool first = !hasRefused_;
     hasRefused_ = true;
@@ -35,7 +36,7 @@ class KeptBytesBudget {
   }
 
  private:
-  const std::size_t most_;
+  const std::size_t limit_;
   std::size_t used_ = 0;
   bool hasRefused_ = false;
 };

@@ -6,8 +6,8 @@
 
 namespace tonewerk {
 
-// "20261120-111800+0100": the local time of `now` (seconds since 1970) where the clocks are `utcOffset` ahead
-// of UTC, for names of files.
+// Returns the local time of `now` (seconds since 1970) for use in file names, such as "20261120-111800+0100".
+// `utcOffset`: by how much local time is ahead of UTC.
 std::string localTimeText(double now, std::chrono::minutes utcOffset);
 
 }  // namespace tonewerk

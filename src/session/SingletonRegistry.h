@@ -13,11 +13,11 @@
 
 namespace tonewerk {
 
-// The objects of which a process has one but which session/ does not know: those of the workers, the monitor
-// and the driver statistics. Found by their type, each made once, on first use, and ended with all others,
-// last made first.
+// Holds the process-wide objects of the rooms above session/: the workers', the monitor's and the driver
+// statistics'. Each is found by its type and made once, on first use. All end with the registry, the one made
+// last first.
 //
-// Any thread. Making one may use others, not itself.
+// Any thread. The constructor of an object may get other objects, but not itself.
 class SingletonRegistry {
  public:
   SingletonRegistry() = default;
@@ -25,7 +25,7 @@ class SingletonRegistry {
   SingletonRegistry& operator=(const SingletonRegistry&) = delete;
   ~SingletonRegistry();
 
-  // The one T; the first call makes it of `arguments`. Lives as long as this does.
+  // Returns the T. The first call makes it from `arguments`. It lives as long as the registry.
   template <class T, class... Arguments>
   T& get(Arguments&&... arguments) {
     Slot& slot = slotOf(typeid(T));
@@ -34,7 +34,7 @@ class SingletonRegistry {
     return *static_cast<T*>(slot.object.load());
   }
 
-  // Null as long as nobody has asked for it to be made.
+  // Returns null until get() has made the T.
   template <class T>
   T* find() {
     return static_cast<T*>(slotOf(typeid(T)).object.load());
@@ -50,7 +50,7 @@ class SingletonRegistry {
   void keep(Slot& slot, std::shared_ptr<void> object);
 
   Mutex mutex_;
-  std::map<std::type_index, Slot> slots_ GUARDED_BY(mutex_);  // a slot keeps its place
+  std::map<std::type_index, Slot> slots_ GUARDED_BY(mutex_);  // a slot never moves
   // In the order in which they were made.
   std::vector<std::shared_ptr<void>> objects_ GUARDED_BY(mutex_);
 };

@@ -19,7 +19,7 @@ void SinkQueue::submit(std::size_t bytes, Task work) {
   }
   queue_->async([this, bytes, work = std::move(work)]() mutable {
     work();
-    work = nullptr;  // its memory goes before room is reported
+    work = nullptr;  // frees its memory before its room is reported
     finished(bytes);
   });
 }

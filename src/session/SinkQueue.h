@@ -9,10 +9,11 @@
 
 namespace tonewerk {
 
-// A serial queue for a sink's slow work, bounded by the memory that waits on it.
+// Runs a sink's slow work on a serial queue, and limits how much memory the queued work holds.
 //
-// submit() waits while more than kMaxWaitingBytes wait: the work queue then waits too, and through the
-// socket the clients do, so that nothing accepted is dropped. Destroying it runs what is queued.
+// submit() waits while the queued work holds more than kMaxWaitingBytes. The work queue then waits too, and
+// so do the clients, whose sockets are not read. Thus nothing that was accepted is dropped. The destructor
+// runs what is still queued.
 class SinkQueue {
  public:
   static constexpr std::size_t kMaxWaitingBytes = std::size_t{64} << 20;
@@ -20,17 +21,17 @@ class SinkQueue {
   explicit SinkQueue(std::unique_ptr<SerialQueue> queue);
   ~SinkQueue();
 
-  // Any thread but the queue's own. `bytes`: what `work` holds. A piece larger than the bound waits for an
-  // empty queue only.
+  // Queues `work`, which holds `bytes`. Any thread but the queue's own. A piece larger than the bound waits
+  // until the queue is empty.
   void submit(std::size_t bytes, Task work);
 
-  // Any thread; never waits. For work that keeps next to nothing and is bounded by other means.
+  // Queues `work` without waiting. Any thread. For work that holds few bytes and is bounded by other means.
   void post(Task work);
 
   // Returns when everything submitted before has run.
   void drain();
 
-  // As SerialQueue's.
+  // As in SerialQueue.
   bool isCurrent() const;
   bool ownsThisThread() const;
 

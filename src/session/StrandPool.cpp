@@ -11,20 +11,20 @@
 namespace tonewerk {
 namespace {
 
-// What a held piece takes beside what it keeps: so that empty ones are bounded, too.
+// What each held piece counts for beside its own bytes, so that the number of empty pieces is limited, too.
 constexpr std::size_t kPieceBytes = 256;
 
 }  // namespace
 
 struct StrandPool::Shared {
   Mutex mutex;
-  SinkQueue* thread GUARDED_BY(mutex) = nullptr;  // null when it is gone
-  std::set<Strand*> holding GUARDED_BY(mutex);    // queues that hold pieces
+  SinkQueue* thread GUARDED_BY(mutex) = nullptr;  // null once the pool ends
+  std::set<Strand*> holding GUARDED_BY(mutex);    // strands that hold pieces
   std::size_t heldBytes GUARDED_BY(mutex) = 0;
   std::size_t heldCount GUARDED_BY(mutex) = 0;
   std::uint64_t droppedCount GUARDED_BY(mutex) = 0;
 
-  bool keep(Strand& queue, std::size_t bytes) {
+  bool reserve(Strand& strand, std::size_t bytes) {
     const MutexLock lock(mutex);
     if (heldBytes + bytes > kMaxHeldBytes) {
       ++droppedCount;
@@ -32,15 +32,15 @@ struct StrandPool::Shared {
     }
     heldBytes += bytes;
     ++heldCount;
-    holding.insert(&queue);
+    holding.insert(&strand);
     return true;
   }
 
-  void give(Strand& queue, std::size_t bytes, std::size_t count, bool isEmpty) {
+  void giveBack(Strand& strand, std::size_t bytes, std::size_t count, bool isEmpty) {
     const MutexLock lock(mutex);
     heldBytes -= bytes;
     heldCount -= count;
-    if (isEmpty) holding.erase(&queue);
+    if (isEmpty) holding.erase(&strand);
   }
 };
 
@@ -57,16 +57,17 @@ StrandPool::~StrandPool() {
     shared_->thread = nullptr;
   }
   thread_.reset();
-  // Held pieces refer to whoever refers to their queue, so nobody else lets go of them.
+  // A held piece may refer to an object that refers to its strand. Only taking the pieces out ends that
+  // cycle.
   for (;;) {
-    std::shared_ptr<Strand> queue;
+    std::shared_ptr<Strand> strand;
     {
       const MutexLock lock(shared_->mutex);
       if (shared_->holding.empty()) return;
-      queue = (*shared_->holding.begin())->weak_from_this().lock();
+      strand = (*shared_->holding.begin())->weak_from_this().lock();
       shared_->holding.erase(shared_->holding.begin());
     }
-    if (queue != nullptr) queue->takeHeld();
+    if (strand != nullptr) strand->takeHeld();
   }
 }
 
@@ -128,7 +129,7 @@ void Strand::release() {
   while (!isHeld_ && !held_.empty()) {
     const Piece piece = std::move(held_.front());
     held_.pop_front();
-    shared_->give(*this, piece.bytes, 1, held_.empty());
+    shared_->giveBack(*this, piece.bytes, 1, held_.empty());
     piece.work();
   }
 }
@@ -146,7 +147,7 @@ bool Strand::ownsThisThread() const {
 void Strand::runOrHold(std::size_t bytes, Task work) {
   if (!isHeld_) {
     work();
-  } else if (shared_->keep(*this, bytes + kPieceBytes)) {
+  } else if (shared_->reserve(*this, bytes + kPieceBytes)) {
     held_.push_back({bytes + kPieceBytes, std::move(work)});
   } else {
     ++droppedCount_;
@@ -158,7 +159,7 @@ std::deque<Strand::Piece> Strand::takeHeld() {
   held_.clear();
   std::size_t bytes = 0;
   for (const Piece& piece : taken) bytes += piece.bytes;
-  shared_->give(*this, bytes, taken.size(), true);
+  shared_->giveBack(*this, bytes, taken.size(), true);
   return taken;
 }
 

@@ -13,33 +13,34 @@ namespace tonewerk {
 class Strand;
 class SinkQueue;
 
-// Serial queues that sessions have for themselves, all on one thread: thousands of sessions do not make
-// thousands of threads, and a session that waits for something holds up no other.
+// Makes serial queues (strands), one for each session that needs one, and runs them all on one thread. So
+// thousands of sessions do not need thousands of threads, and a session that waits does not delay the others.
 //
 //   submit() -> [the thread's queue, 64 MiB] -> runs
 //                                            -> held behind a piece that waits, 8 MiB -> runs when released
 //                                                                                     -> dropped and counted
 //
-// A full thread's queue makes submit() wait, since the thread gets on with it; what is held waits for others,
-// for seconds, and so never holds up who submits.
+// submit() waits while the thread's queue is full, because the thread works on it. It never waits for held
+// pieces, which may wait for seconds.
 class StrandPool {
  public:
-  // What all queues together hold back.
+  // The bytes that all strands together may hold back.
   static constexpr std::size_t kMaxHeldBytes = std::size_t{8} << 20;
 
   explicit StrandPool(std::unique_ptr<SerialQueue> thread);
   StrandPool(const StrandPool&) = delete;
   StrandPool& operator=(const StrandPool&) = delete;
-  // Runs what is not held and drops the rest. The queues may live on; they are then without effect.
+  // Runs the pieces that are not held and drops the held ones. Strands may outlive the pool; interrupt() then
+  // does nothing.
   ~StrandPool();
 
   // Any thread.
   std::shared_ptr<Strand> makeQueue();
 
-  // Returns when everything submitted before has run or is held.
+  // Returns when every piece submitted before has run or is held.
   void drain();
 
-  // How many pieces were dropped so far, and how many are held.
+  // How many pieces have been dropped so far, and how many are held now.
   std::uint64_t droppedCount() const;
   std::size_t heldCount() const;
 
@@ -51,7 +52,7 @@ class StrandPool {
   std::unique_ptr<SinkQueue> thread_;
 };
 
-// One of them. Lives as long as somebody refers to it, work that it holds included.
+// One serial queue of a StrandPool. Lives while there is a reference to it; its pieces of work may have one.
 class Strand : public std::enable_shared_from_this<Strand> {
  public:
   explicit Strand(std::shared_ptr<StrandPool::Shared> shared);
@@ -59,21 +60,22 @@ class Strand : public std::enable_shared_from_this<Strand> {
   Strand& operator=(const Strand&) = delete;
   ~Strand();
 
-  // Any thread but the queues' own, while StrandPool lives. Pieces run in the order of their submission.
-  // `bytes`: what `work` keeps.
+  // Queues `work`, which holds `bytes`. Any thread but the pool's own, while the pool lives. Pieces run in
+  // the order of their submission.
   void submit(std::size_t bytes, Task work);
 
-  // Any thread; never waits, and does nothing once StrandPool is gone. Runs `work` on the thread between
-  // two pieces, also while the queue is held: at once from inside one.
+  // Runs `work` on the pool's thread between two pieces, even while the strand holds pieces back. From
+  // inside a piece it runs `work` before it returns. Any thread; never waits; does nothing once the pool is
+  // gone.
   void interrupt(Task work);
 
-  // On the thread. After hold() the pieces behind the running one wait for release(), which runs them before
-  // it returns; one of them may hold again.
+  // On the pool's thread. After hold() the pieces behind the running one wait for release(), which runs them
+  // before it returns. One of them may call hold() again.
   void hold();
   void release();
   bool isHeld() const;
 
-  // On the thread. How many pieces found no room since the last call.
+  // On the pool's thread. Returns how many pieces were dropped since the last call because they did not fit.
   std::uint64_t takeDroppedCount();
 
  private:
@@ -83,13 +85,13 @@ class Strand : public std::enable_shared_from_this<Strand> {
     Task work;
   };
 
-  // Also true on any thread once StrandPool is gone. For assertions.
+  // True on the pool's thread, and on any thread once the pool is gone. For assertions.
   bool ownsThisThread() const;
   void runOrHold(std::size_t bytes, Task work);
   std::deque<Piece> takeHeld();
 
   const std::shared_ptr<StrandPool::Shared> shared_;
-  // The thread's own.
+  // Used on the pool's thread alone.
   bool isHeld_ = false;
   std::deque<Piece> held_;
   std::uint64_t droppedCount_ = 0;

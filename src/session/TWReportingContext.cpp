@@ -14,7 +14,7 @@ namespace {
 
 constexpr std::string_view kSubsystem = "com.orvane.tonewerk";
 
-// The one global of the daemon.
+// The daemon's only global object.
 std::atomic<TWReportingContext*> currentContext = nullptr;
 
 constexpr AudioEventType kLastTypeWithText = 18;  // "MemoryLog" (19) is shown but not read back
@@ -96,7 +96,7 @@ StrandPool& TWReportingContext::linkReportQueues() {
   return *linkReportQueues_;
 }
 
-// What waits for backends now waits in vain.
+// Work that still waits for backends is lost, since no answer can come any more. Logs how much it was.
 void TWReportingContext::endLinkReportQueues() {
   if (linkReportQueues_ == nullptr) return;
   linkReportQueues_->drain();

@@ -24,22 +24,22 @@ namespace tonewerk {
 
 class WeakQueueRef;
 
-// Everything of which there is one in the process: the platform's services, the work queue, the log
-// categories, the worker registry, the lookup tables, the internal-build answer. The entry point makes one
-// and each test makes one afresh; the free functions that take no argument find it through current().
+// Holds what the process has one of: the platform's services, the work queue, the log categories, the worker
+// registry, the lookup tables, and whether this is an internal build. main() makes one context, and each test
+// makes its own. The free functions without arguments find it through current().
 //
 // Any thread, unless a member says otherwise.
 class TWReportingContext {
  public:
-  // `workerClasses`: all there are, in the registry's order. Becomes current().
+  // `workerClasses`: all worker classes, in the registry's order. The new object becomes current().
   TWReportingContext(const Platform& platform,
                      std::vector<const TWReportingSessionWorkerClass*> workerClasses);
   TWReportingContext(const TWReportingContext&) = delete;
   TWReportingContext& operator=(const TWReportingContext&) = delete;
-  // Runs what is still queued on the queues made here.
+  // Runs what is still queued on the context's queues.
   ~TWReportingContext();
 
-  // There must be one.
+  // The context that was made. There must be one.
   static TWReportingContext& current();
 
   const Platform& platform() const { return platform_; }
@@ -47,26 +47,28 @@ class TWReportingContext {
   // The one serial queue that carries every request body, session and worker call. Made on first use.
   SerialQueue& reportingServerQueue();
 
-  // True where clients, sessions and workers may be used: on the work queue (SerialQueue::ownsThisThread()), and
-  // on any thread while there is no work queue. For assertions.
+  // True where clients, sessions and workers may be used: on the work queue
+  // (SerialQueue::ownsThisThread()), and on any thread while there is no work queue. For assertions.
   bool isOnReportingServerQueue() const;
 
-  // The way onto it for what may come when it is gone. Closes before the queue ends.
+  // A reference to the work queue for handlers that may be called when the queue is gone. It is closed
+  // before the queue ends.
   std::shared_ptr<WeakQueueRef> reportingServerQueueGate();
 
-  // Where sinks that write files do so, so that the work queue does not wait for a disk. Made on first use.
+  // The queue on which sinks write files, so that the work queue does not wait for a disk. Made on first use.
   SinkQueue& fileSinkQueue();
 
-  // Where sessions' workers use the real-time-communication reporting service. Made on first use.
+  // The strands on which sessions' workers use the real-time-communication reporting service. Made on first
+  // use.
   StrandPool& linkReportQueues();
 
-  // Asked of the device once.
+  // Whether the device says that this is an internal build. Asks it once.
   bool isInternalBuild();
 
-  // Filled by the first session.
+  // Filled on first use.
   const TWReportingSessionWorkerRegistry& workerRegistry();
 
-  // What rooms above this one have one of. Ends after the queues made here.
+  // The process-wide objects of the rooms above session/. They end after the context's queues.
   SingletonRegistry& singles() { return singles_; }
 
   // On the work queue.
@@ -75,7 +77,7 @@ class TWReportingContext {
     return names_;
   }
 
-  // Values of the base categories' and the types' texts.
+  // The numbers of the base categories and of the types, by their texts.
   using Lookup = std::unordered_map<std::string, std::uint32_t>;
   const Lookup& categoryLookup();
   const Lookup& typeLookup();
@@ -116,7 +118,8 @@ class TWReportingContext {
   void endReportingServerQueue();
   void endLinkReportQueues();
 
-  // Last, so that they end first: their work may use anything above. The work queue feeds the sinks'.
+  // The queues are the last members, so that they end first: their work may use every member above. Among
+  // them the work queue is last, because its work submits to the sinks' queues.
   std::once_flag fileSinkQueueOnce_;
   std::unique_ptr<SinkQueue> fileSinkQueue_;
   std::once_flag linkReportQueuesOnce_;
@@ -124,7 +127,7 @@ class TWReportingContext {
   std::once_flag reportingServerQueueOnce_;
   std::unique_ptr<SerialQueue> reportingServerQueue_;
   std::atomic<SerialQueue*> livingReportingServerQueue_ = nullptr;  // until the queue's last work has run
-  std::shared_ptr<WeakQueueRef> reportingServerQueueGate_;          // made with the queue
+  std::shared_ptr<WeakQueueRef> reportingServerQueueGate_;          // made with the work queue
 };
 
 }  // namespace tonewerk

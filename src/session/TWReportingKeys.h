@@ -7,8 +7,8 @@
 
 namespace tonewerk {
 
-// Keys of payloads and configurations. Those that every message carries are ready-made texts, so that setting
-// them allocates nothing.
+// Keys of payloads and configurations. Those that every message has are SharedString constants, so that
+// setting them allocates nothing.
 inline const SharedString TWReportingInternalEventEpochTime("twreporting_timestamp");
 inline const SharedString TWReportingMessageKeyTWTimestamp = TWReportingInternalEventEpochTime;
 inline const SharedString TWReportingInternalEventInvalidTimestamp("invalid_timestamp");
@@ -20,7 +20,7 @@ inline constexpr std::string_view TWReportingInternalEventProcessUptimeMS = "pro
 inline constexpr std::string_view TWReportingInternalEventSystemUptimeSec = "systemuptime_sec";
 inline constexpr std::string_view TWReportingQMApplicationName = "QMHostApplicationDisplayID";
 
-// Of a test session's configuration: what is traced, and where the benchmark data file goes.
+// Keys of a test session's configuration: what is traced, and where the benchmark data file is written.
 inline constexpr std::string_view TWReportingKolviPlistFilePath = "TWReportingKolviPlistFilePath";
 inline constexpr std::string_view TWReportingKolviOutputFileName = "TWReportingKolviOutputFileName";
 inline constexpr std::string_view TWReportingKolviOutputFileDirectory = "TWReportingKolviOutputFileDirectory";

@@ -10,15 +10,15 @@
 
 namespace tonewerk {
 
-// Names that are made out of a message's category and type and a session's service, each composed once.
+// Composes names from a message's category and type and a session's service. Each name is composed once.
 //
-// Bounded whatever clients send: categories, types and services without a text of their own share one place.
-// On the work queue.
+// The table's size is bounded, whatever clients send: categories, types and services that have no text of
+// their own share one place. Used on the work queue.
 class TWReportingNameTable {
  public:
   TWReportingNameTable();
 
-  // The category's text followed by the type's, as "PlaybackStart".
+  // The category's text followed by the type's, such as "PlaybackStart".
   const SharedString& audioTag(AudioEventCategory category, AudioEventType type);
 
   // "com.orvane.tonewerk.<category>.<type>" and "com.orvane.<service>.<category>.<type>".

@@ -17,7 +17,7 @@ namespace {
 
 constexpr double kOldestTimestampSeconds = 31'536'000.0;  // 365 days
 
-// What a stored message takes beside its payload: the record and its places in the list and among the newest.
+// What a stored message takes beside its payload: the record and its entries in messages_ and newest_.
 constexpr std::size_t kRecordBytes = sizeof(TWReportingSessionMessage) + 64;
 
 const Value kUnknownName("Unknown");
@@ -54,7 +54,7 @@ TWReportingSession::TWReportingSession(Private, ReporterID reporterID, ProcessId
       serviceName_(TWReportingUtilityGenerateServiceNameFromServiceType(kServiceUnknown)) {}
 
 TWReportingSession::~TWReportingSession() {
-  sayHowManyWereNotKept();
+  logUnkeptCount();
   emitTracePoint(TWReportingTracePoint::kSessionReleased);
   infoLog(TWReportingSessionCategory(), "deallocing this session %lli", reporterID_);
   budget_->give(keptBytes());
@@ -136,7 +136,7 @@ void TWReportingSession::makeWorker(const TWReportingSessionWorkerClass& workerC
            reporterID_);
   const auto worker = workerClass.initWithSession(shared_from_this());
   if (worker == nullptr) {
-    // Not remembered: a later start tries again, as the service type may have changed by then.
+    // A later start tries again, because the service type may have changed by then.
     debugLog(TWReportingSessionCategory(),
              "TWReportingSessionWorker failed to initialize. action=failure worker=%@ reporterID=%lli",
              workerClass, reporterID_);
@@ -170,7 +170,7 @@ void TWReportingSession::startWorker(TWReportingSessionWorkerProtocol& worker) {
            yesOrNo(worker.started), reporterID_);
 }
 
-// Each worker once, at its first place.
+// Returns each worker once, at the place where it comes first.
 TWReportingSession::Workers TWReportingSession::workersInOrder(Order order) const {
   const bool consumersFirst = order == Order::kConsumersFirst;
   const MutexLock lock(propertiesMutex_);
@@ -209,8 +209,8 @@ void TWReportingSession::sendMessage(const std::shared_ptr<TWReportingSessionMes
 }
 
 void TWReportingSession::deliver(const TWReportingSessionMessage& message) {
-  for (std::size_t at = 0; at < consumers_.size();
-       ++at) {  // by place: a worker may send, or start the session
+  // By index, because a worker that sends or starts the session may add consumers.
+  for (std::size_t at = 0; at < consumers_.size(); ++at) {
     const Consumer worker = consumers_[at];
     if (!worker->started) continue;
     if (message.isRedundant && !worker->handleRedundantMessages()) continue;
@@ -227,7 +227,7 @@ void TWReportingSession::stop() {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   (void)store(lifecycleMessage(kTypeStop, "stop"));  // likewise
   debugLog(TWReportingSessionCategory(), "stop called. reporterID=%lli", reporterID_);
-  if (!started_) return sayHowManyWereNotKept();
+  if (!started_) return logUnkeptCount();
   debugLog(TWReportingSessionCategory(), "ending session. reporterID=%lli", reporterID_);
   emitTracePoint(TWReportingTracePoint::kSessionEnding);
   TWReportingSessionMessage::sortMessages(messages_);
@@ -241,7 +241,7 @@ void TWReportingSession::stop() {
     debugLog(TWReportingSessionCategory(), "TWReportingSessionWorker action=stop worker=%@ reporterID=%lli",
              worker->workerClass(), reporterID_);
   }
-  sayHowManyWereNotKept();
+  logUnkeptCount();
   forgetMessages();
   totalMessageCount_ = 0;
   redundantMessageCount_ = 0;
@@ -266,7 +266,7 @@ std::shared_ptr<TWReportingSessionMessage> TWReportingSession::lifecycleMessage(
 bool TWReportingSession::store(const std::shared_ptr<TWReportingSessionMessage>& message) {
   const std::size_t bytes = kRecordBytes + message->message.bytes();
   if (!budget_->take(bytes)) {
-    sayOnceThatNoMoreIsKept();
+    logFullBudgetOnce();
     return false;
   }
   messageBytes_ += bytes;
@@ -280,7 +280,7 @@ void TWReportingSession::rememberAsNewest(const TWReportingSessionMessage& messa
 }
 
 bool TWReportingSession::mergeWithinBudget(ValueMap& map, const ValueMap& more) {
-  // A merge adds at most what it merges; what it replaced is given back.
+  // A merge adds at most more.bytes(). The bytes that it replaced are given back afterwards.
   const std::size_t before = map.bytes();
   if (!budget_->take(more.bytes())) return false;
   map.merge(more);
@@ -288,21 +288,21 @@ bool TWReportingSession::mergeWithinBudget(ValueMap& map, const ValueMap& more) 
   return true;
 }
 
-void TWReportingSession::sayOnceThatNoMoreIsKept() {
+void TWReportingSession::logFullBudgetOnce() {
   if (!budget_->isFirstRefusal()) return;
   errorLog(
       TWReportingSessionCategory(),
       "the client's sessions keep %zu bytes, the most is %zu: further messages are delivered but not kept. "
       "reporterID=%lli",
-      budget_->used(), budget_->most(), reporterID_);
+      budget_->used(), budget_->limit(), reporterID_);
 }
 
 void TWReportingSession::logUnkeptMessages() {
   assert(TWReportingUtilityIsOnReportingServerQueue());
-  sayHowManyWereNotKept();
+  logUnkeptCount();
 }
 
-void TWReportingSession::sayHowManyWereNotKept() {
+void TWReportingSession::logUnkeptCount() {
   if (unkeptMessageCount_ == 0) return;
   errorLog(TWReportingSessionCategory(), "messages delivered but not kept: count=%lu reporterID=%lli",
            std::exchange(unkeptMessageCount_, 0), reporterID_);
@@ -395,7 +395,7 @@ void TWReportingSession::addPreviousValues(const ValueMap& values) {
     const MutexLock lock(propertiesMutex_);
     if (mergeWithinBudget(previousValues_, values)) return;
   }
-  sayOnceThatNoMoreIsKept();
+  logFullBudgetOnce();
 }
 
 std::size_t TWReportingSession::workerInstanceCount() const {

@@ -21,17 +21,17 @@
 
 namespace tonewerk {
 
-// One reporting session of one client: its stored messages and its workers.
+// Represents one reporting session of one client, with its stored messages and its workers.
 //
 //   initWithID() -> [setServiceType, configuration] -> start() -> sendMessage()... -> stop() -> start() again
 //   ...
 //
-// Messages are taken, and delivered to the workers that start with the session, before start() too. At start
-// the consumers start first, then the producers, then the rest; at stop the producers stop first, so that
-// what they derive still passes the running consumers.
+// The session takes messages before start(), too, and delivers them to the workers that start with the
+// session. At start the consumers start first, then the producers, then the rest. At stop the producers
+// stop first, so that the running consumers still get the messages that producers derive.
 //
-// Everything happens on the work queue; configuration(), previousValues(), clientProcessName() and the worker
-// lists may be read from any thread. No operation fails towards its caller.
+// Used on the work queue. configuration(), previousValues(), clientProcessName() and the worker lists may
+// be read on any thread.
 class TWReportingSession : public std::enable_shared_from_this<TWReportingSession> {
   struct Private {};
 
@@ -40,8 +40,8 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   using Workers = std::vector<TWReportingSessionWorkerClass::Worker>;
   using TransactionCompleteBlock = std::function<void(const std::optional<ReplyError>& error, bool success)>;
 
-  // Makes the session and its start-on-init workers. The first identifier is the owning process. What the
-  // session keeps is taken from `budget`, of the session's own when null.
+  // Makes the session and its start-on-init workers. The first process identifier is the owning process's.
+  // The bytes that the session keeps are taken from `budget`; null gives the session a budget of its own.
   static std::shared_ptr<TWReportingSession> initWithID(ReporterID reporterID,
                                                         ProcessIdentifiers processIdentifiers,
                                                         std::shared_ptr<KeptBytesBudget> budget = nullptr);
@@ -54,32 +54,34 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
 
   void setServiceType(AudioServiceType serviceType);
 
-  // Adds the map's entries; its "QMHostApplicationDisplayID" serves as application name unless it names one
-  // itself. Null does nothing. False, and nothing changed, when there is no room left to keep them.
+  // Adds the map's entries. Its "QMHostApplicationDisplayID" becomes the application name, unless the map
+  // has an application name, too. Null does nothing. Returns false, and changes nothing, when the budget
+  // has no room.
   bool updateConfigurationWithContentsOfConfiguration(const ValueMap* configuration);
 
   void start();
   void startWorkersFromClasses(const std::vector<const TWReportingSessionWorkerClass*>& classes);
   void stop();
 
-  // Says how many messages were delivered but not kept, when there were some since this was last said. stop()
-  // and the session's end say it themselves.
+  // Logs how many messages were delivered but not kept since this was last logged, if there were any.
+  // stop() and the destructor log it themselves.
   void logUnkeptMessages();
 
   using MessageReply = std::function<void(const std::optional<ReplyError>& error)>;
-  // Normalises, judges, stores and delivers the message, then replies without an error. The record becomes
-  // the session's.
+  // Normalises the message, decides whether it is redundant, stores and delivers it, then replies without
+  // an error. The record then belongs to the session.
   void sendMessage(const std::shared_ptr<TWReportingSessionMessage>& message,
                    const MessageReply& reply = nullptr);
 
-  // What a message goes through on its way in, in this order.
+  // The steps that normalise a message, in this order.
   static void addMissingDates(TWReportingSessionMessage& message);
   static void removeWhiteSpaceFromKeys(TWReportingSessionMessage& message);
   static void addAudioMessageTag(TWReportingSessionMessage& message);
   void addAppName(TWReportingSessionMessage& message) const;
 
-  // Whether it repeats, in all but its times, the newest stored message of its category and type. Errors
-  // never do. O(keys), however many messages are stored.
+  // True when the message repeats the newest stored message of its category and type in everything but its
+  // times. An error is never redundant. Takes time proportional to the number of keys, however many
+  // messages are stored.
   bool messageIsRedundant(const TWReportingSessionMessage& message) const;
 
   static double getEpochTimeFromTWReportingStateMessage(const TWReportingSessionMessage& message) {
@@ -97,15 +99,15 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   // The latest value of every key received.
   ValueMap previousValues() const;
   void addPreviousValues(const ValueMap& values);
-  // The client has given the session up: what it keeps no longer counts against the client, however long
-  // others hold it.
+  // Moves the bytes that the session keeps out of the client's budget. For a session that the client has
+  // given up but that may live on.
   void leaveBudget();
-  // Not redundant ones, in order of arrival; sorted by time while the session stops.
+  // The stored messages, without redundant ones, in order of arrival; sorted by time while the session stops.
   const TWReportingSessionMessages& messages() const { return messages_; }
-  // Received since the session was made or last stopped, and how many of them were redundant.
+  // How many messages were received since the session was made or last stopped, and how many were redundant.
   std::uint64_t totalMessageCount() const { return totalMessageCount_; }
   std::uint64_t redundantMessageCount() const { return redundantMessageCount_; }
-  // Monotonic time; none while it is not started.
+  // The monotonic time of the start; none while the session is not started.
   std::optional<std::chrono::nanoseconds> startedAt() const { return startedAt_; }
   bool started() const { return started_; }
   bool isSingleMessageSession() const { return isSingleMessageSession_; }
@@ -119,7 +121,7 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
 
   std::string description() const;
 
-  // Held for the request layer: the start request's answer, given when the session stops.
+  // Answers the start request, when the session stops. Set and called by service/.
   TransactionCompleteBlock transactionCompleteBlock;
 
  private:
@@ -133,15 +135,15 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   void startWorker(TWReportingSessionWorkerProtocol& worker);
   Workers workersInOrder(Order order) const;
   void deliver(const TWReportingSessionMessage& message);
-  // Taken from the budget.
+  // The bytes that the session has taken from the budget.
   std::size_t keptBytes() const;
-  // False when there is no room left to keep it.
+  // Returns false when the budget has no room for the message.
   [[nodiscard]] bool store(const std::shared_ptr<TWReportingSessionMessage>& message);
   void rememberAsNewest(const TWReportingSessionMessage& message);
-  // Adds `more` to `map` when the budget has room for it.
+  // Adds `more` to `map`. Returns false, and changes nothing, when the budget has no room for it.
   [[nodiscard]] bool mergeWithinBudget(ValueMap& map, const ValueMap& more) REQUIRES(propertiesMutex_);
-  void sayOnceThatNoMoreIsKept();
-  void sayHowManyWereNotKept();
+  void logFullBudgetOnce();
+  void logUnkeptCount();
   void forgetMessages();
 
   const ReporterID reporterID_;
@@ -156,12 +158,12 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   std::optional<std::chrono::nanoseconds> startedAt_;
 
   TWReportingSessionMessages messages_;
-  // The newest stored message of each category and type. Ordered: clients choose the keys, and must not be
-  // able to choose colliding ones.
+  // The newest stored message of each category and type. An ordered map, because clients choose the keys
+  // and could choose ones that collide in a hash table.
   std::map<std::pair<AudioEventCategory, AudioEventType>, const TWReportingSessionMessage*> newest_;
   std::size_t messageBytes_ = 0;          // taken from the budget for messages_
-  std::uint64_t unkeptMessageCount_ = 0;  // delivered, for want of room not stored, and not yet said
-  std::vector<Consumer> consumers_;       // consumingMessageWorkers_ under their consumer face
+  std::uint64_t unkeptMessageCount_ = 0;  // delivered but not stored for lack of room, and not logged yet
+  std::vector<Consumer> consumers_;       // consumingMessageWorkers_ as consumers
 
   // The properties that any thread may read. Only the work queue writes them.
   mutable Mutex propertiesMutex_;

@@ -33,7 +33,7 @@ double TWReportingSessionMessage::epochTime() const {
 }
 
 void TWReportingSessionMessage::sortMessages(TWReportingSessionMessages& messages) {
-  // The times are read once, not at every comparison.
+  // Each time is read once, not at every comparison.
   struct Timed {
     double time;
     std::shared_ptr<TWReportingSessionMessage> message;

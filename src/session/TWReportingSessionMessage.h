@@ -13,25 +13,25 @@ namespace tonewerk {
 
 struct TWReportingSessionWorkerClass;
 
-// One message of a session: what a client sent, or what the daemon made itself.
+// Holds one message of a session, which a client sent or the daemon made.
 //
-// A session's records are shared by its workers and changed only on the work queue. A worker that wants to
-// keep one beyond a call, or change it, takes a copy.
+// A session shares its records with its workers. They are changed only on the work queue. A worker that
+// keeps a record beyond a call, or changes it, takes a copy.
 class TWReportingSessionMessage {
  public:
-  // The payload's values are shared, the map is the record's own.
+  // The record shares the payload's values, but has a map of its own.
   TWReportingSessionMessage(ValueMap payload, AudioEventCategory messageCategory, AudioEventType messageType);
 
-  // A record of its own with everything but the destination workers: a copy may go to any.
+  // Returns a copy without the destination workers: a copy may go to any worker.
   std::shared_ptr<TWReportingSessionMessage> copyWithZone() const;
 
   // "category=Playback type=Start {...}"
   std::string description() const;
 
-  // Seconds since 1970 out of "twreporting_timestamp"; 0 without one.
+  // The "twreporting_timestamp" in seconds since 1970; 0 when there is none.
   double epochTime() const;
 
-  // Stable, ascending by epochTime(). One whose time is not a number counts as without time.
+  // Sorts by epochTime(), ascending and stable. A time that is not a number counts as 0.
   static void sortMessages(std::vector<std::shared_ptr<TWReportingSessionMessage>>& messages);
 
   ValueMap message;
@@ -39,15 +39,16 @@ class TWReportingSessionMessage {
   AudioEventType type;
   bool isRedundant = false;
   bool isSessionStarted = false;
-  // When not empty, only consumers of these classes get the message.
+  // If not empty, only consumers of these classes get the message.
   std::vector<const TWReportingSessionWorkerClass*> destinationWorkers;
 
-  // Excludes others from this record; BasicLockable.
+  // Locks this record. BasicLockable.
   void lock() const;
   void unlock() const;
 
  private:
-  mutable std::atomic_flag locked_;  // a byte instead of a mutex's forty: there is one a stored message
+  // Takes 1 byte instead of the 40 of a mutex; there is one in each stored message.
+  mutable std::atomic_flag locked_;
 };
 
 using TWReportingSessionMessages = std::vector<std::shared_ptr<TWReportingSessionMessage>>;

@@ -13,7 +13,8 @@
 
 namespace tonewerk {
 
-// A worker class as the registry knows it. There is one object a class, and it stands for the class.
+// Describes a worker class for the registry. Each class has one object of this type, whose address
+// identifies it.
 struct TWReportingSessionWorkerClass {
   using Worker = std::shared_ptr<TWReportingSessionWorkerProtocol>;
 
@@ -22,8 +23,8 @@ struct TWReportingSessionWorkerClass {
   bool isConsumer;
   bool startOnInit;
   bool handleSingleMessageSession;
-  // Null for a class whose instances cannot be made; gives null for a session to which the worker does not
-  // apply.
+  // Makes a worker; returns null when the worker does not apply to the session. A null pointer for a class
+  // whose workers cannot be made.
   Worker (*initWithSession)(const std::shared_ptr<TWReportingSession>& session);
 
   std::string description() const { return std::string(name); }
@@ -66,8 +67,9 @@ constexpr auto maker() -> TWReportingSessionWorkerClass::Worker (*)(const Sessio
 
 }  // namespace worker_class_detail
 
-// The description of class T: its roles from what it derives from, its answers from its static functions, and
-// how it is made from its static initWithSession(session), which may give null, or else its constructor.
+// Returns the description of class T. The base classes of T say whether it is a producer or a consumer; its
+// static functions say the rest. Workers are made by its static initWithSession(session), which may return
+// null, or else by its constructor.
 template <typename T>
 constexpr TWReportingSessionWorkerClass workerClassOf(std::string_view name) {
   return {name,

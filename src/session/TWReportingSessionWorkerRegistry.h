@@ -7,13 +7,12 @@
 
 namespace tonewerk {
 
-// The process's worker classes by what they are. Filled once, then only read, on any thread.
+// Lists the process's worker classes by their roles. Filled by the constructor, then read on any thread.
 class TWReportingSessionWorkerRegistry {
  public:
   using Classes = std::vector<const TWReportingSessionWorkerClass*>;
 
-  // Sorts `all` out; a class whose instances cannot be made is logged and left out of every list but
-  // allClasses().
+  // Fills the lists from `all`. A class whose workers cannot be made is logged and is in allClasses() only.
   explicit TWReportingSessionWorkerRegistry(Classes all);
 
   const Classes& allClasses() const { return all_; }

@@ -29,7 +29,7 @@ TWReportingSessionMessages TWReportingSessionWorkerUtility::combineRapidMessages
       result.push_back(message);
       continue;
     }
-    // The anchor's time moves on with every merge. A pause that is no number is no short one.
+    // Each merge updates the anchor's time. A pause that is not a number does not count as short.
     if (message->epochTime() - anchor->epochTime() < maximumPausetime) {
       anchor->message.merge(message->message);
     } else {

@@ -8,18 +8,18 @@
 
 namespace tonewerk {
 
-// What several workers need.
+// Functions that several workers use.
 class TWReportingSessionWorkerUtility {
  public:
-  // Merges bursts of messages that each carry one of `keysToCombine` into the burst's first message, whose
-  // payload is changed in place, and gives the surviving records in order. A burst ends with a key's second
-  // coming; a message that comes `maximumPausetime` seconds or more after the last merged one stands alone
-  // and does not end it.
+  // Merges each burst of messages that have one of `keysToCombine` into the burst's first message, and
+  // returns the remaining records in order. The first message's payload is changed in place. A burst ends
+  // when one of its keys comes again. A message that comes `maximumPausetime` seconds or more after the
+  // last merged one is not merged, but does not end the burst.
   static TWReportingSessionMessages combineRapidMessages(const TWReportingSessionMessages& messages,
                                                          std::span<const std::string_view> keysToCombine,
                                                          double maximumPausetime);
 
-  // Whether a video call reported that a position was invalid: any key begins with "vdac_invalid_".
+  // True when a video call reported that a position was invalid: a key begins with "vdac_invalid_".
   static bool isVidroXYerrorMessage(const TWReportingSessionMessage& message);
 };
 

@@ -5,7 +5,7 @@
 
 namespace tonewerk {
 
-// The daemon's trace points: the codes that a tracer sees.
+// The daemon's trace points, with the codes that a tracer sees.
 enum class TWReportingTracePoint : std::uint32_t {
   kRequestCreate = 0x21044814,
   kRequestStart = 0x21044818,
@@ -19,14 +19,15 @@ enum class TWReportingTracePoint : std::uint32_t {
   kMessageReceived = 0x21044838,
 };
 
-// Emits it through the platform.
+// Emits `point` through the platform.
 void emitTracePoint(TWReportingTracePoint point);
 
-// A request's body: emits its point, and is an interval of the request's name from here to the end of the
-// scope, in which performance traces can show it.
+// Traces the body of a request: emits its trace point, and marks an interval from here to the end of the
+// scope. The interval has the request's name, so that performance traces can show it.
 class TracedRequest {
  public:
-  // `point` is a request's. `identifier` tells intervals apart: the session's, 0 for none.
+  // `point` must be one of a request. `identifier` is the session's, or 0 without a session; it tells
+  // intervals apart.
   explicit TracedRequest(TWReportingTracePoint point, std::int64_t identifier = 0);
   TracedRequest(const TracedRequest&) = delete;
   TracedRequest& operator=(const TracedRequest&) = delete;

@@ -15,15 +15,15 @@
 namespace tonewerk {
 namespace {
 
-// As many fraction digits as asked for, then without trailing zeros down to `least`.
-std::string decimalText(double value, int most, int least) {
+// Writes `maxDigits` fraction digits and removes trailing zeros, but leaves at least `minDigits` of them.
+std::string decimalText(double value, int maxDigits, int minDigits) {
   char digits[400];
-  std::snprintf(digits, sizeof(digits), "%.*f", most, value);  // rounds halves to even
+  std::snprintf(digits, sizeof(digits), "%.*f", maxDigits, value);  // rounds halves to even
   std::string text = digits;
   const std::size_t point = text.find('.');
   if (point == std::string::npos) return text;
   std::size_t size = text.size();
-  while (size > point + 1 + static_cast<std::size_t>(least) && text[size - 1] == '0') --size;
+  while (size > point + 1 + static_cast<std::size_t>(minDigits) && text[size - 1] == '0') --size;
   text.resize(size);
   return text;
 }
@@ -46,7 +46,7 @@ double TWReportingUtilityVolumeMinimumPlayingTime(AudioServiceType /*type*/) { r
 
 ValueMap TWReportingUtilityAddDates(const ValueMap& map) {
   const Platform& platform = TWReportingContext::current().platform();
-  // Single precision, as readers of this figure have always got it.
+  // Computed in single precision, because readers of this value have always got it so.
   const auto ticks = static_cast<float>(platform.processes.processorTimeMicroseconds());
   const float processorMs = ticks / 1000000.0F * 1000.0F;
 
@@ -75,8 +75,8 @@ std::optional<std::string> TWReportingUtilityBucketNumberToString(double value,
     bestDistance = distance;
   }
   if (best == nullptr) return std::nullopt;
-  const int most = fractionDigits > 0 ? fractionDigits : 0;
-  return decimalText(*best, most, most > 0 ? 1 : 0);
+  const int maxDigits = fractionDigits > 0 ? fractionDigits : 0;
+  return decimalText(*best, maxDigits, maxDigits > 0 ? 1 : 0);
 }
 
 bool TWReportingUtilityKeyIsPresentAndHasChanged(std::string_view key, const ValueMap* first,

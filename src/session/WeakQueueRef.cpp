@@ -14,7 +14,8 @@ bool WeakQueueRef::run(Task work) {
       return true;
     }
   }
-  // Without the lock: the work may come here again. The queue does not end while its own work runs.
+  // Runs without the lock, because the work may call run() again. The queue does not end while its own work
+  // runs.
   work();
   return true;
 }

@@ -6,27 +6,27 @@
 
 namespace tonewerk {
 
-// The way onto the work queue for a platform service's answer, which comes on a thread of the service's and
-// when the service likes: perhaps when the queue is gone. Whoever gives a service a handler lets it hold the
-// gate.
+// Refers to the work queue without keeping it alive. A platform service answers on a thread of its own, at
+// any time, perhaps when the queue is gone. The handler that a service is given therefore holds a
+// WeakQueueRef and reaches the queue through it.
 //
-// Any thread. Lives as long as somebody holds it.
+// Any thread.
 class WeakQueueRef {
  public:
   explicit WeakQueueRef(SerialQueue& queue) : queue_(&queue) {}
   WeakQueueRef(const WeakQueueRef&) = delete;
   WeakQueueRef& operator=(const WeakQueueRef&) = delete;
 
-  // Runs `work` on the queue: before it returns when it is called from the queue's own work, else later.
-  // False when the gate is closed; then `work` does not run. Never waits for the queue.
+  // Runs `work` on the queue. Called from the queue's own work, it runs `work` before it returns, else later.
+  // Returns false, and does not run `work`, once close() has been called. Never waits for the queue.
   bool run(Task work);
 
-  // From now on nothing comes through. Before the queue ends.
+  // From now on run() runs nothing. Must be called before the queue ends.
   void close();
 
  private:
   Mutex mutex_;
-  SerialQueue* queue_ GUARDED_BY(mutex_);  // null when closed
+  SerialQueue* queue_ GUARDED_BY(mutex_);  // null once closed
 };
 
 }  // namespace tonewerk
