@@ -27,12 +27,13 @@ void sendClientUptime(std::int32_t processIdentifier, std::optional<double> star
   if (startDate) {
     const double now = platform.clock.now();
     seconds = std::fabs(now - *startDate);
-    if (*startDate > now) {  // what consumers of the log know by these words
+    if (*startDate > now) {  // the text says the opposite, but readers of the log rely on it
       errorLog(log, "clientStartDate is in the past. clientpid=%d clientprocessname=%@", processIdentifier,
                shownName);
     }
   } else {
-    // Whoever only looks whether somebody listens is gone before the work queue gets to it.
+    // No error: a client that only checks whether the daemon listens is gone before the work queue
+    // registers it.
     infoLog(log, "clientStartDate is nil. clientpid=%d clientprocessname=%@", processIdentifier, shownName);
   }
   infoLog(log, "invalidationHandler: connection exited process=%@ uptime_sec=%d", processName,

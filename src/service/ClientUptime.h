@@ -7,8 +7,8 @@
 
 namespace tonewerk {
 
-// Logs and reports, as an analytics event, how long a client was connected whose connection has just ended.
-// Without a start date (seconds since 1970) the time is -1; without a process name no event is sent. Any
+// Logs how long a client was connected whose connection has just ended, and sends it as an analytics event.
+// Without a start date (seconds since 1970) the time is -1. Without a process name no event is sent. Any
 // thread.
 void sendClientUptime(std::int32_t processIdentifier, std::optional<double> startDate,
                       const std::optional<std::string>& processName);

@@ -10,25 +10,25 @@
 
 namespace tonewerk {
 
-// Which messages somebody wants to see. An empty list wants all.
+// Says which messages a client wants to see. An empty list matches every value.
 struct MessageFilter {
   using Numbers = std::vector<std::int64_t>;
 
-  // Of all its lists together.
+  // The limit for all lists together.
   static constexpr std::size_t kMaxEntries = 4096;
 
-  // Ascending.
+  // Each list is sorted, ascending.
   Numbers reporterIDs;
   Numbers categories;
   Numbers types;
 
   std::size_t size() const { return reporterIDs.size() + categories.size() + types.size(); }
   bool wants(ReporterID reporterID, AudioEventCategory category, AudioEventType type) const {
-    return holds(reporterIDs, reporterID) && holds(categories, category) && holds(types, type);
+    return matches(reporterIDs, reporterID) && matches(categories, category) && matches(types, type);
   }
 
  private:
-  static bool holds(const Numbers& wanted, std::int64_t number) {
+  static bool matches(const Numbers& wanted, std::int64_t number) {
     return wanted.empty() || std::binary_search(wanted.begin(), wanted.end(), number);
   }
 };

@@ -16,13 +16,13 @@ void MessageTap::add(const std::shared_ptr<TapSubscriber>& watcher) {
 }
 
 void MessageTap::offer(const TWReportingSession& session, const TWReportingSessionMessage& message) {
-  bool oneHasGone = false;
+  bool hasExpired = false;
   for (const auto& listed : watchers_) {
     const auto watcher = listed.lock();
-    oneHasGone = oneHasGone || watcher == nullptr;
+    hasExpired = hasExpired || watcher == nullptr;
     if (watcher != nullptr) watcher->offer(session, message);
   }
-  if (oneHasGone) std::erase_if(watchers_, [](const auto& listed) { return listed.expired(); });
+  if (hasExpired) std::erase_if(watchers_, [](const auto& listed) { return listed.expired(); });
 }
 
 }  // namespace tonewerk

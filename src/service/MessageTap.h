@@ -13,14 +13,14 @@ class TapSubscriber;
 class TWReportingSession;
 class TWReportingSessionMessage;
 
-// Who watches the messages that clients send. Those that the daemon derives itself are not shown: they appear
-// where they go, in the reports. On the work queue.
+// Shows the messages that clients send to the clients that watch them. Messages that the daemon derives are
+// not shown; they appear in the reports. Used on the work queue.
 class MessageTap {
  public:
-  // Held weakly: a watcher goes with its connection. Once is enough.
+  // Adds a watcher, unless it was added before. Holds it weakly, because it ends with its connection.
   void add(const std::shared_ptr<TapSubscriber>& watcher);
 
-  // `message` has been received, judged and delivered by `session`.
+  // Shows a message that `session` has received, marked as redundant or not, and delivered.
   void note(const TWReportingSession& session, const TWReportingSessionMessage& message) {
     assert(TWReportingUtilityIsOnReportingServerQueue());
     if (!watchers_.empty()) offer(session, message);

@@ -26,33 +26,34 @@ Value shownApplication(const ValueMap& map) {
 
 namespace {
 
-// A portion of a long row.
+// Collects one portion of a long list of sessions.
 class Portion {
  public:
   explicit Portion(std::size_t first) : first_(first) {}
 
-  // Whether none of the next `count` is in it; they are then passed.
-  bool passes(std::size_t count) {
-    if (passed_ + count > first_ && listed_.size() < kMaxListedSessions) return false;
-    passed_ += count;
+  // Skips the next `count` sessions when none of them belongs to the portion. Returns whether it skipped
+  // them.
+  bool skip(std::size_t count) {
+    if (count_ + count > first_ && listed_.size() < kMaxListedSessions) return false;
+    count_ += count;
     return true;
   }
   void add(const TWReportingSession& session, const std::optional<std::string>& processName);
 
   ValueMap answer() {
-    return {{kWatchKeyTotal, passed_}, {kWatchKeySessions, ValueArray(std::move(listed_))}};
+    return {{kWatchKeyTotal, count_}, {kWatchKeySessions, ValueArray(std::move(listed_))}};
   }
 
  private:
   const std::size_t first_;
   const std::chrono::nanoseconds now_ = TWReportingContext::current().platform().clock.monotonic();
-  std::size_t passed_ = 0;
+  std::size_t count_ = 0;
   std::vector<Value> listed_;
 };
 
 void Portion::add(const TWReportingSession& session, const std::optional<std::string>& processName) {
-  if (passes(1)) return;
-  ++passed_;
+  if (skip(1)) return;
+  ++count_;
   ValueMap shown{{kWatchKeyReporterID, session.reporterID()},
                  {kWatchKeyServiceType, session.serviceType()},
                  {kWatchKeyServiceName, session.serviceName()},
@@ -78,7 +79,7 @@ ValueMap sessionListing(const TWReportingServiceDelegateProtocol& service, std::
   Portion portion(first);
   for (const auto& client : service.getAllClients()) {
     const auto& sessions = client->clientReportingSessionMap();
-    if (portion.passes(sessions.size())) continue;
+    if (portion.skip(sessions.size())) continue;
     for (const auto& [reporterID, session] : sessions) portion.add(*session, client->clientProcessName());
   }
   if (const auto session = service.currentSingleMessageSession()) portion.add(*session, std::nullopt);

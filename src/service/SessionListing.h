@@ -9,18 +9,19 @@ namespace tonewerk {
 
 class TWReportingServiceDelegateProtocol;
 
-// As many sessions as one answer of this kind holds; they come to at most requests::kMaxSessionListingBytes.
+// The most sessions in one answer. They take at most requests::kMaxSessionListingBytes.
 inline constexpr std::size_t kMaxListedSessions = 500;
 
-// {"total", "sessions"}: how many sessions there are, and a portion of them with what they are and do, in
-// order of connection and identifier, the single-message session last. `first` are left out before it. On the
-// work queue.
+// Returns {"total", "sessions"}: how many sessions there are, and a description of each session of a
+// portion. The portion leaves out the first `first` sessions. Sessions are in the order of their clients'
+// connections, then of their identifiers; the single-message session is the last. Call it on the work
+// queue.
 ValueMap sessionListing(const TWReportingServiceDelegateProtocol& service, std::size_t first);
 
-// Names that clients choose are shown this long and no longer.
+// Names that clients choose are cut to this length.
 inline constexpr std::size_t kMaxShownNameBytes = 256;
 
-// The application that a configuration, or a payload on its way to the workers, names.
+// Returns the application name of a configuration or of a normalised payload, cut to kMaxShownNameBytes.
 Value shownApplication(const ValueMap& map);
 
 }  // namespace tonewerk

@@ -41,7 +41,7 @@ TWReportingClientServerInstance::TWReportingClientServerInstance(
 }
 
 TWReportingClientServerInstance::~TWReportingClientServerInstance() {
-  logLine(presenceLevel(), category(), "dealloc %i from the server client list", processIdentifier_);
+  logLine(connectionLogLevel(), category(), "dealloc %i from the server client list", processIdentifier_);
 }
 
 template <typename Body>
@@ -61,7 +61,7 @@ void TWReportingClientServerInstance::createReportingSession(ReporterID reporter
       return reply(messagingError(kOverLimit, "the connection holds " + std::to_string(sessions.size()) +
                                                   " sessions, the most there may be"));
     }
-    // A session that stood there is dropped without a stop: its client has given it up.
+    // An earlier session with this identifier is dropped without a stop, because its client has given it up.
     const Session session = self.makeSession(reporterID);
     session->setClientProcessName(self.clientProcessName());
     sessions[reporterID] = session;
@@ -82,17 +82,18 @@ void TWReportingClientServerInstance::setServiceType(AudioServiceType serviceTyp
   });
 }
 
-// A session reports for one service: another type makes another session, not started, with what the first was
-// told.
+// A session reports for one service. A change of the type therefore makes a new session, not started, with
+// the configuration and the previous values of the old one.
 void TWReportingClientServerInstance::changeServiceType(AudioServiceType serviceType,
                                                         const Session& session) {
   if (session->serviceType() == serviceType) return session->setServiceType(serviceType);
   const ValueMap configuration = session->configuration();
   const ValueMap previousValues = session->previousValues();
-  // First, so that there is room for what moves on, however full the budget is.
+  // Comes first, so that the budget has room for the new session's copies, however full it is.
   session->leaveBudget();
   const Session replacement = makeSession(session->reporterID());
-  (void)replacement->updateConfigurationWithContentsOfConfiguration(&configuration);  // fits, see above
+  // It fits, because the old session has left the budget.
+  (void)replacement->updateConfigurationWithContentsOfConfiguration(&configuration);
   replacement->addPreviousValues(previousValues);
   replacement->setServiceType(serviceType);
   clientReportingSessionMap_[session->reporterID()] = replacement;
@@ -102,7 +103,7 @@ void TWReportingClientServerInstance::getServiceNameForReporterID(ReporterID rep
                                                                   ServiceRequest request) {
   onWorkQueue(std::move(request), [reporterID](auto& self, auto&, const Reply& reply) {
     debugLog(category(), "fetching seviceType");
-    // Identifier 0 is answered twice; clients have come to count on the first.
+    // Identifier 0 is answered twice, because clients rely on the first answer.
     if (reporterID == 0) reply(std::nullopt, kServiceUnknown);
     const Session session = self.findReportingSessionForID(reporterID, true);
     const AudioServiceType serviceType = session == nullptr ? kServiceUnknown : session->serviceType();
@@ -131,7 +132,7 @@ void TWReportingClientServerInstance::startReportingSessionForID(ReporterID repo
     debugLog(category(), "starting session for reporter %lli", reporterID);
     const Session session = self.ownSession(reporterID);
     if (session == nullptr) return reply(std::nullopt, true);
-    if (session->started()) return;  // unanswered on purpose: the first start's answer speaks for both
+    if (session->started()) return;  // not answered on purpose: the first start's answer counts for both
     session->start();
     if (session->transactionCompleteBlock) session->transactionCompleteBlock(std::nullopt, true);
     session->transactionCompleteBlock = [reply](const std::optional<ReplyError>& error, bool success) {
@@ -168,7 +169,7 @@ void TWReportingClientServerInstance::sendMessage(ValueMap message, AudioEventCa
                 const std::vector<Session> sessions = delegate.findReportingSessionsForIDs(reporterIDs);
                 for (std::size_t at = 0; at < sessions.size(); ++at) {
                   ValueMap payload = message;
-                  // The last session then holds it alone, and need not copy it to change it.
+                  // The last session then holds the only reference and can change the message without a copy.
                   if (at + 1 == sessions.size()) message = ValueMap();
                   const auto record =
                       std::make_shared<TWReportingSessionMessage>(std::move(payload), messageCategory, type);
@@ -262,7 +263,7 @@ TWReportingClientServerInstance::Session TWReportingClientServerInstance::findRe
   return delegate == nullptr ? nullptr : delegate->findReportingSessionForID(reporterID);
 }
 
-// Identifier 0 is "no session", although one may be stored under it.
+// Identifier 0 means "no session", although the map may have a session under it.
 TWReportingClientServerInstance::Session TWReportingClientServerInstance::ownSession(
     ReporterID reporterID) const {
   const auto own = clientReportingSessionMap_.find(reporterID);
@@ -285,7 +286,7 @@ void TWReportingClientServerInstance::handleConnectionError() {
     }
     self->clientReportingSessionMap_.clear();
     delegate->removeClient(*self);
-    logLine(self->presenceLevel(), category(), "removing %i from the server client list",
+    logLine(self->connectionLogLevel(), category(), "removing %i from the server client list",
             self->processIdentifier_);
   });
 }

@@ -20,22 +20,22 @@ namespace tonewerk {
 class TWReportingServiceDelegateProtocol;
 class TWReportingSession;
 
-// One connected client process and its sessions: what its connection's requests are made to.
+// Represents a connected client process and its sessions, and carries out its requests.
 //
-// Each request is moved onto the work queue, where it runs in the order of arrival; only the kill request
-// acts at once, and a client is an onlooker at once. clientStartDate and clientProcessName may be read and
-// set on any thread, the session map belongs to the work queue.
+// Each request is moved onto the work queue, where requests run in the order of arrival. Only the kill
+// request and the mark as onlooker take effect at once. clientStartDate and clientProcessName may be read
+// and set on any thread. The session map is used on the work queue.
 class TWReportingClientServerInstance final
     : public TWReportingServiceProtocol,
       public std::enable_shared_from_this<TWReportingClientServerInstance> {
  public:
-  // Creating one more is refused, and so is a message that names more: a list of identifiers, however often
-  // it names one session, must not turn one frame into a million deliveries.
+  // The most sessions that a client may hold, and that a message may name. A list of identifiers may name a
+  // session many times; without a limit one frame could cause a million deliveries.
   static constexpr std::size_t kMaxSessions = 4096;
 
   using SessionMap = std::map<ReporterID, std::shared_ptr<TWReportingSession>>;
 
-  // `delegate` is held weakly; a request that finds it gone does nothing.
+  // The object holds `delegate` weakly. A request does nothing when the delegate is gone.
   TWReportingClientServerInstance(std::int32_t processIdentifier,
                                   std::weak_ptr<TWReportingServiceDelegateProtocol> delegate);
   TWReportingClientServerInstance(const TWReportingClientServerInstance&) = delete;
@@ -57,19 +57,20 @@ class TWReportingClientServerInstance final
   void killService() override;
   void observe(ServiceRequest request) override;
 
-  // This client's session of that identifier, else, when asked to, any client's; null when there is none.
+  // Returns this client's session with that identifier. If it has none and `acrossAllClients` is true,
+  // returns another client's. Null when there is none.
   std::shared_ptr<TWReportingSession> findReportingSessionForID(ReporterID reporterID, bool acrossAllClients);
 
-  // The connection is lost: stops the started sessions, drops them all and leaves the service's list. Any
-  // thread; only the first call does anything.
+  // Call it when the connection is lost. Queues the end of the client: its started sessions stop, all are
+  // dropped, and the client leaves the service's list. Any thread; only the first call does anything.
   void handleConnectionError();
 
   std::int32_t processIdentifier() const { return processIdentifier_; }
 
-  // Whether it has said that it only looks on. Any thread.
+  // Whether the client has said that it is an onlooker, which changes nothing. Any thread.
   bool isOnlooker() const { return isOnlooker_; }
 
-  // Seconds since 1970; none until the service has registered the client.
+  // In seconds since 1970; none until the service has registered the client.
   std::optional<double> clientStartDate() const;
   void setClientStartDate(double date);
   std::optional<std::string> clientProcessName() const;
@@ -81,12 +82,12 @@ class TWReportingClientServerInstance final
   using Delegate = std::shared_ptr<TWReportingServiceDelegateProtocol>;
   using Session = std::shared_ptr<TWReportingSession>;
 
-  // Queues `body`, called with the delegate and the reply, on the work queue.
+  // Queues `body` on the work queue. It is called with this object, the delegate and the reply.
   template <typename Body>
   void onWorkQueue(ServiceRequest request, Body body);
 
-  // Of log lines on its coming and going: nobody wants to read of who only looks.
-  LogLevel presenceLevel() const { return isOnlooker_ ? LogLevel::kDebug : LogLevel::kInfo; }
+  // The level of the log lines about the client's connection. An onlooker's are for debugging only.
+  LogLevel connectionLogLevel() const { return isOnlooker_ ? LogLevel::kDebug : LogLevel::kInfo; }
   Session ownSession(ReporterID reporterID) const;
   Session makeSession(ReporterID reporterID) const;
   void changeServiceType(AudioServiceType serviceType, const Session& session);

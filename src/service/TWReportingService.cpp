@@ -185,7 +185,7 @@ TWReportingService::Session TWReportingService::makeSingleMessageSession() {
   session->setSingleMessageSession(true);
   session->setServiceType(kServiceStandalone);
   const ValueMap configuration{{TWReportingApplicationName, "Unknown"}};
-  (void)session->updateConfigurationWithContentsOfConfiguration(&configuration);  // fits a budget of its own
+  (void)session->updateConfigurationWithContentsOfConfiguration(&configuration);  // fits: its budget is empty
   session->start();
   return session;
 }
@@ -201,7 +201,8 @@ void TWReportingService::_reapSingleMessageSession() {
   }
   infoLog(category(), "Stopping singleMessageSession after timeout=%f", kSingleMessageSessionTimeoutSeconds);
   singleMessageSessionReaper_.reset();
-  // Queued under the lock, so that whoever finds the session gone also finds its stop on the queue.
+  // Queued under the lock, so that a thread that finds no session knows that its stop is already on the
+  // queue.
   TWReportingUtilityGetReportingServerQueue().async(
       [session = std::exchange(singleMessageSession_, nullptr)] { session->stop(); });
 }
@@ -225,7 +226,7 @@ void TWReportingService::removeClient(const TWReportingClientServerInstance& cli
 void TWReportingService::logReportingSessions() {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   const LogCategory* log = category();
-  if (!log->isEnabled(LogLevel::kDebug)) return;  // the list is made for the log alone
+  if (!log->isEnabled(LogLevel::kDebug)) return;  // the list is needed for the log only
   const std::vector<Session> active = getAllActiveReportingSessions();
   debugLog(log, "%ld active reporting session(s) %@", active.size(), active);
 }

@@ -15,25 +15,27 @@
 
 namespace tonewerk {
 
-// The daemon's one service object: accepts clients, keeps their list, finds sessions across them, and owns
-// the single-message session, which takes messages without reporter identifiers while no session is started.
+// Accepts clients, keeps their list and finds sessions across clients. The daemon has one service. It owns
+// the single-message session, which takes messages without reporter identifiers while no session is
+// started.
 //
-// Reached by three kinds of thread: the messaging thread (acceptance and the connections' handlers), the work
-// queue (everything that concerns clients and sessions) and the reaper's.
+// Three kinds of thread call it: the messaging threads (acceptance and the connections' handlers), the work
+// queue (everything about clients and sessions) and the timers' thread (the reaper).
 class TWReportingService final : public MessagingListenerDelegate,
                                  public TWReportingServiceDelegateProtocol,
                                  public std::enable_shared_from_this<TWReportingService> {
  public:
   static constexpr double kSingleMessageSessionTimeoutSeconds = 5.0;
 
-  // `endProcess` is called on the kill request, on the thread that brings it; it need not return.
+  // `endProcess` is called for the kill request, on the messaging thread that received it. It need not
+  // return.
   static std::shared_ptr<TWReportingService> make(std::function<void()> endProcess);
   explicit TWReportingService(std::function<void()> endProcess);
   TWReportingService(const TWReportingService&) = delete;
   TWReportingService& operator=(const TWReportingService&) = delete;
   ~TWReportingService() override;
 
-  // Takes every connection, whoever the peer is.
+  // Accepts every connection, whichever process the peer is.
   [[nodiscard]] bool listenerShouldAcceptNewConnection(MessagingConnection& connection) override;
 
   Session findReportingSessionForID(ReporterID reporterID) override;
@@ -48,11 +50,12 @@ class TWReportingService final : public MessagingListenerDelegate,
   MessageTap& messageTap() override;
   void endProcess() override { endProcess_(); }
 
-  // The reaper's tick, twice a second on its thread: takes out the single-message session when it was last
-  // used more than kSingleMessageSessionTimeoutSeconds ago, and has the work queue stop it.
+  // The reaper calls this twice a second on the timers' thread. When the single-message session was last
+  // used more than kSingleMessageSessionTimeoutSeconds ago, it is taken out, and its stop is queued on the
+  // work queue.
   void _reapSingleMessageSession();
 
-  // At the daemon's end: stops the single-message session, if there is one. On the work queue.
+  // Stops the single-message session, if there is one. Called at the daemon's end, on the work queue.
   void stopSingleMessageSession();
 
   void setReportingEnabled(bool enabled) { reportingEnabled_ = enabled; }
@@ -66,8 +69,8 @@ class TWReportingService final : public MessagingListenerDelegate,
 
   const std::function<void()> endProcess_;
   std::atomic<bool> reportingEnabled_ = true;
-  std::vector<Client> clients_;  // in order of connection; on the work queue
-  MessageTap messageTap_;        // likewise
+  std::vector<Client> clients_;  // in order of connection; used on the work queue
+  MessageTap messageTap_;        // used on the work queue
 
   Mutex mutex_;  // held while a client is made and while a session is searched for; guards no member
 

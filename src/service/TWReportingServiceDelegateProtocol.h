@@ -13,7 +13,7 @@ class MessageTap;
 class TWReportingClientServerInstance;
 class TWReportingSession;
 
-// What client objects ask of the service. On the work queue unless said otherwise.
+// What client objects need of the service. Called on the work queue, unless a member says otherwise.
 class TWReportingServiceDelegateProtocol {
  public:
   using Session = std::shared_ptr<TWReportingSession>;
@@ -21,12 +21,12 @@ class TWReportingServiceDelegateProtocol {
 
   virtual ~TWReportingServiceDelegateProtocol() = default;
 
-  // The session of that identifier of the client that connected first; null for 0, for an unknown identifier
-  // and while reporting is disabled.
+  // Returns the session with that identifier; if several clients have one, that of the client that connected
+  // first. Null for 0, for an unknown identifier and while reporting is disabled.
   virtual Session findReportingSessionForID(ReporterID reporterID) = 0;
 
-  // Where a message goes: the sessions named, as far as they exist; without names every started session, or
-  // else the single-message session.
+  // Returns the sessions that a message goes to: the named ones that exist. Without names these are all
+  // started sessions, or the single-message session when none is started.
   virtual std::vector<Session> findReportingSessionsForIDs(
       const std::optional<std::vector<ReporterID>>& reporterIDs) = 0;
 
@@ -45,11 +45,11 @@ class TWReportingServiceDelegateProtocol {
   virtual void removeClient(const TWReportingClientServerInstance& client) = 0;
   virtual void logReportingSessions() = 0;
 
-  // Whoever watches the messages that clients send.
+  // Shows clients' messages to the clients that watch.
   virtual MessageTap& messageTap() = 0;
 
-  // Ends the process with the exit status 2 once what the sinks were handed is written; stops no session. Any
-  // thread.
+  // Ends the process with exit status 2 when the sinks have written what they were given. Does not stop
+  // sessions. Any thread.
   virtual void endProcess() = 0;
 };
 

@@ -30,13 +30,13 @@ TWReportingServiceProtocol::ReporterIDs reporterIDsOf(const Argument& argument) 
   return identifiers;
 }
 
-// Where a connection's requests go.
+// The objects that carry out a connection's requests.
 struct Targets {
   TWReportingServiceProtocol& service;
   WatchRequests& watch;
 };
 
-// What a request brought beside its method. A handler moves out of it.
+// What a request has beside its method. A handler moves out of it.
 struct Incoming {
   Arguments arguments;
   Reply reply;
@@ -50,7 +50,7 @@ void sendMessage(const Targets& to, Incoming& in) {
   const auto category = static_cast<AudioEventCategory>(in.arguments[1]->integer());
   const auto type = static_cast<AudioEventType>(in.arguments[2]->integer());
   auto identifiers = reporterIDsOf(in.arguments[3]);
-  // Let go first, so that the message's storage is not shared and the session need not copy it to change it.
+  // Cleared first, so that nothing shares the message's storage and the session can change it without a copy.
   in.arguments.clear();
   to.service.sendMessage(std::move(message), category, type, std::move(identifiers), in.request());
 }
@@ -114,7 +114,7 @@ constexpr Handler kHandlers[] = {
 
 constexpr std::size_t kNoHandler = std::size(kHandlers);
 
-// Where the handler of a request stands; kNoHandler when it has none.
+// Returns the index of a request's handler in kHandlers; kNoHandler when it has none.
 constexpr std::size_t handlerOf(const Method& method) {
   for (std::size_t at = 0; at < std::size(kHandlers); ++at) {
     if (kHandlers[at].name == method.name) return at;
@@ -122,7 +122,7 @@ constexpr std::size_t handlerOf(const Method& method) {
   return kNoHandler;
 }
 
-// The handlers in the order of requests::kAll.
+// The indexes of the handlers, in the order of requests::kAll.
 constexpr auto kHandlerOf = [] {
   std::array<std::size_t, requests::kAll.size()> places{};
   for (std::size_t at = 0; at < places.size(); ++at) places[at] = handlerOf(requests::kAll[at]);

@@ -10,15 +10,15 @@
 
 namespace tonewerk {
 
-// The way back for one request, and what says that its body has run.
+// Answers one request, and tells the connection, when it is destroyed, that the request's body has run.
 struct ServiceRequest {
   Reply reply;
   InFlightToken token;
 };
 
-// The daemon's request set, as a client's connection makes it, and the request to be no client but an
-// onlooker. Called on the messaging thread; the answers come from the work queue. An answer is true, never
-// false: unknown sessions are no errors.
+// The requests of the daemon's request set, and the request to be an onlooker instead of a client. Called
+// on the messaging thread; the answers come from the work queue. Where an answer is a bool it is always
+// true: unknown sessions are not errors.
 class TWReportingServiceProtocol {
  public:
   using ReporterIDs = std::optional<std::vector<ReporterID>>;
@@ -31,18 +31,19 @@ class TWReportingServiceProtocol {
   // Answers with the service type's number, despite its name.
   virtual void getServiceNameForReporterID(ReporterID reporterID, ServiceRequest request) = 0;
   virtual void setConfiguration(ValueMap configuration, ReporterID reporterID, ServiceRequest request) = 0;
-  // Answered when the session stops.
+  // The answer comes when the session stops.
   virtual void startReportingSessionForID(ReporterID reporterID, ServiceRequest request) = 0;
-  // To the sessions named; without names to every started one.
+  // Sends to the named sessions; without names to every started session, or else to the single-message
+  // session.
   virtual void sendMessage(ValueMap message, AudioEventCategory category, AudioEventType type,
                            ReporterIDs reporterIDs, ServiceRequest request) = 0;
   virtual void stopReportingSessionForID(ReporterID reporterID, ServiceRequest request) = 0;
   virtual void destroyReportingSession(ReporterID reporterID, ServiceRequest request) = 0;
   virtual void reporterIDValid(ReporterID reporterID, ServiceRequest request) = 0;
   virtual void getAllReporters(ServiceRequest request) = 0;
-  // Ends the process. Never answered.
+  // Ends the process. The request is never answered.
   virtual void killService() = 0;
-  // The connection only looks on: it makes and changes nothing, and how long it lasted is not reported.
+  // Makes the connection an onlooker: it may change nothing, and how long it lasted is not reported.
   virtual void observe(ServiceRequest request) = 0;
 };
 

@@ -35,14 +35,14 @@ void TapSubscriber::offer(const TWReportingSession& session, const TWReportingSe
   } else {
     keep(std::move(seen));
   }
-  // Answered behind the work that is queued already, so that what comes in a flood goes in few answers.
+  // The answer is queued behind the work that is already there, so that many messages go into few answers.
   if (!isHeld_ || std::exchange(answerIsQueued_, true)) return;
   TWReportingUtilityGetReportingServerQueue().async([held = weak_from_this()] {
-    if (const auto watcher = held.lock()) watcher->answerWithNews();
+    if (const auto watcher = held.lock()) watcher->answerQueued();
   });
 }
 
-// The oldest give way: who watches wants to see what happens now.
+// Drops the oldest messages first, because a watcher wants to see what happens now.
 void TapSubscriber::keep(SeenMessage message) {
   waitingBytes_ += message.bytes();
   waiting_.push_back(std::move(message));
@@ -62,15 +62,15 @@ TapSubscriber::SeenMessage TapSubscriber::takeOldest() {
 void TapSubscriber::next(Reply reply, InFlightToken token) {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   if (isHeld_) answerHeld();
-  if (hasNews()) return reply(std::nullopt, takeAnswer());
+  if (hasAnswer()) return reply(std::nullopt, takeAnswer());
   isHeld_ = true;
   heldReply_ = std::move(reply);
   heldToken_ = std::move(token);
 }
 
-void TapSubscriber::answerWithNews() {
+void TapSubscriber::answerQueued() {
   answerIsQueued_ = false;
-  if (hasNews()) answerHeld();  // an earlier answer may have taken them
+  if (hasAnswer()) answerHeld();  // an earlier answer may have taken the messages
 }
 
 void TapSubscriber::answerHeld() {
@@ -90,12 +90,12 @@ ValueMap TapSubscriber::takeAnswer() {
       continue;
     }
     bytes += oldest.bytes();
-    messages.emplace_back(oldest.shown());
+    messages.emplace_back(oldest.toValue());
   }
   return {{kWatchKeyMissed, std::exchange(missed_, 0)}, {kWatchKeyMessages, ValueArray(std::move(messages))}};
 }
 
-ValueMap TapSubscriber::SeenMessage::shown() const {
+ValueMap TapSubscriber::SeenMessage::toValue() const {
   return {{kWatchKeyReporterID, reporterID},
           {kWatchKeyServiceType, serviceType},
           {kWatchKeyCategory, category},

@@ -17,34 +17,35 @@ namespace tonewerk {
 class TWReportingSession;
 class TWReportingSessionMessage;
 
-// One client that watches messages: what it wants, and what has arrived and waits for its next request.
+// Keeps the messages that one watching client wants to see, until the client's next request.
 //
 //   open() -> offer() offer() ... -> next() answers at once with what waits
 //          -> next() held back    -> offer() has the work queue answer it, after what is queued by then
 //
-// A client that does not ask in time misses the oldest messages, and is told how many; so it costs no more
-// than the bounds below, and delays nobody. On the work queue.
+// A client that does not ask in time misses the oldest messages, and the next answer says how many. So it
+// takes no more memory than the bounds below and delays nothing else. Used on the work queue.
 class TapSubscriber final : public std::enable_shared_from_this<TapSubscriber> {
  public:
-  // What waits: so many messages, and of so many bytes together.
+  // The most messages that wait, and the most bytes that they take together.
   static constexpr std::size_t kMaxMessages = 4096;
   static constexpr std::size_t kMaxBytes = std::size_t{4} << 20;
-  // What an answer may come to. A message that alone comes to more is missed.
+  // The most bytes of an answer. A larger message is missed.
   static constexpr std::size_t kMaxAnswerBytes = requests::kMaxMessagesBytes;
-  // What a message comes to beside its payload, here and in an answer.
+  // The bytes that a message counts for beside its payload, here and in an answer.
   static constexpr std::size_t kRecordBytes = 512;
-  // A payload nested deeper is missed: a frame may nest 32 levels, and the answer puts four around it.
+  // A payload that nests deeper is missed: a frame may have 32 levels, and four of them are the answer's own.
   static constexpr std::size_t kMaxPayloadLevels = 28;
 
-  // Begins anew: forgets what waits and what was missed.
+  // Starts over with `filter`: drops the waiting messages and the count of missed ones.
   void open(MessageFilter filter);
   bool isOpen() const { return isOpen_; }
 
-  // A message that a session has received and judged. Keeps a reference to its payload, if it is wanted.
+  // Takes a message that a session has received and marked as redundant or not. If the filter matches,
+  // keeps a reference to the payload.
   void offer(const TWReportingSession& session, const TWReportingSessionMessage& message);
 
-  // Answers {"missed", "messages"}, now or when there is something. A request that is still held back is
-  // answered with nothing: there is one at a time.
+  // Answers {"missed", "messages"}, at once or when there is something to answer. Only one request is held
+  // back: if there is an earlier one, it is answered first, with what there is, perhaps nothing.
   void next(Reply reply, InFlightToken token);
 
   std::size_t waitingMessages() const { return waiting_.size(); }
@@ -60,13 +61,13 @@ class TapSubscriber final : public std::enable_shared_from_this<TapSubscriber> {
     ValueMap payload;
 
     std::size_t bytes() const { return kRecordBytes + payload.bytes(); }
-    ValueMap shown() const;
+    ValueMap toValue() const;
   };
 
-  bool hasNews() const { return missed_ > 0 || !waiting_.empty(); }
+  bool hasAnswer() const { return missed_ > 0 || !waiting_.empty(); }
   void keep(SeenMessage message);
   SeenMessage takeOldest();
-  void answerWithNews();
+  void answerQueued();
   void answerHeld();
   ValueMap takeAnswer();
 

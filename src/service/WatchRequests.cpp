@@ -26,7 +26,7 @@ MessageFilter::Numbers numbersOf(const Argument& list) {
   return numbers;
 }
 
-std::size_t placeOf(const Argument& number) {
+std::size_t startIndexOf(const Argument& number) {
   return static_cast<std::size_t>(std::max<std::int64_t>(number->integer(), 0));
 }
 
@@ -54,7 +54,7 @@ void WatchRequests::onWorkQueue(Body body, Reply reply, InFlightToken token) {
 
 void WatchRequests::sessions(const Arguments& arguments, Reply reply, InFlightToken token) {
   onWorkQueue(
-      [first = placeOf(arguments[0])](auto& service, const Reply& answer, InFlightToken&) {
+      [first = startIndexOf(arguments[0])](auto& service, const Reply& answer, InFlightToken&) {
         answer(std::nullopt, sessionListing(service, first));
       },
       std::move(reply), std::move(token));

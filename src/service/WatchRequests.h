@@ -11,11 +11,12 @@ namespace tonewerk {
 class TapSubscriber;
 class TWReportingServiceDelegateProtocol;
 
-// One connection's requests to see what the daemon does now: its sessions, and messages as they arrive. Each
-// takes the request's arguments, which suit its description in protocol/Requests.h, on the messaging thread.
+// Carries out one connection's requests to see what the daemon does: its sessions, and messages as they
+// arrive. Each is called on the messaging thread, with arguments that were checked against
+// protocol/Requests.h.
 class WatchRequests {
  public:
-  // `service` is held weakly; a request that finds it gone does nothing.
+  // The object holds `service` weakly. A request does nothing when the service is gone.
   WatchRequests(std::int32_t processIdentifier, std::weak_ptr<TWReportingServiceDelegateProtocol> service);
 
   void sessions(const Arguments& arguments, Reply reply, InFlightToken token);
@@ -23,14 +24,14 @@ class WatchRequests {
   void nextMessages(Reply reply, InFlightToken token);
 
  private:
-  // Runs `body` with the service on the work queue. What it needs of this object it holds itself, since this
-  // object goes with the connection.
+  // Runs `body` with the service on the work queue. `body` must not refer to this object, which ends with the
+  // connection.
   template <class Body>
   void onWorkQueue(Body body, Reply reply, InFlightToken token);
 
   const std::int32_t processIdentifier_;
   const std::weak_ptr<TWReportingServiceDelegateProtocol> service_;
-  const std::shared_ptr<TapSubscriber> subscriber_;  // the work queue's
+  const std::shared_ptr<TapSubscriber> subscriber_;  // used on the work queue
 };
 
 }  // namespace tonewerk

@@ -53,11 +53,11 @@ constexpr int kFailure = 1;
 constexpr int kUsage = 2;
 constexpr int kKilled = 2;
 
-// How long the end waits for a disk that does not answer.
+// How long the end of the daemon waits for a disk that does not answer.
 constexpr std::chrono::seconds kFlushTimeout{10};
-// How long it waits for endpoints in the network.
+// How long it waits for network endpoints.
 constexpr std::chrono::seconds kNetworkTimeout{5};
-// How long evidence is still collected for.
+// How long it still collects evidence.
 constexpr std::chrono::seconds kDiagnosticsTimeout{3};
 
 constexpr std::string_view kHelp =
@@ -72,8 +72,8 @@ constexpr std::string_view kHelp =
     "things\n"
     "are, TONEWERK_LOG what is logged (debug, info, default, error, or a list such as twrr=debug,default).\n";
 
-// The thread that serves clients feeds the service manager's watchdog, where there is one: what blocks the
-// work queue, which some handlers do for minutes by design, is no reason to end the daemon.
+// The thread that serves clients feeds the service manager's watchdog, if there is one. The work queue does
+// not, because some handlers block it for minutes by design, which is no reason to end the daemon.
 std::unique_ptr<WatchdogFeeder> watchdogOf(const ServiceManager& manager, const Clock& clock) {
   const auto interval = manager.pingInterval();
   if (!interval) return nullptr;
@@ -85,7 +85,7 @@ DbusNames dbusNames() {
           "com.orvane.tonewerk.TWReportingServiceProtocol"};
 }
 
-// The daemon's parts, in the order in which they need one another.
+// Holds the daemon's parts, in the order in which they depend on each other.
 class Daemon {
  public:
   Daemon(const Directories& directories, std::unique_ptr<ServerSocket> socket, LinuxPlatform& linux,
@@ -109,8 +109,8 @@ class Daemon {
         service_(TWReportingService::make([this] { endOnKillRequest(); })),
         listener_(std::move(socket), log, watchdogOf(manager, linux.clock()), ::geteuid(), &linux.memory()),
         dbusListener_(dbusNames(), requests::all(), dbusAddressFromEnvironment(), log, &linux.memory()) {
-    diagnostics_.removeLeftovers();  // the socket is ours, so no other daemon writes there
-    // Asked for now, so that device facts that are read again later change nothing about it.
+    diagnostics_.removeLeftovers();  // this daemon has the socket, so no other one writes there
+    // Read once here, so that reading the device facts again later does not change it.
     hasSignposts_ = context_.isInternalBuild() && isTracingBuiltIn();
     listener_.setDelegate(*service_);
     listener_.resume();
@@ -118,11 +118,11 @@ class Daemon {
     dbusListener_.resume();
     runtimeWatcher_ = std::make_unique<DirectoryWatcher>(
         runtimeDirectory_, [](std::string_view) {}, [this] { restoreRuntimeDirectory(); }, log_);
-    restoreRuntimeDirectory();  // it may have gone before it was watched
+    restoreRuntimeDirectory();  // it may have been removed before it was watched
     manager_.tellReady(status_);
   }
 
-  // What is kept of preferences and device facts, and where clients connect, is looked at again.
+  // Reads the preferences and device facts again, and restores the runtime directory with the socket.
   void reload() {
     manager_.tellReloading();
     linux_.readConfigurationAgain();
@@ -133,8 +133,8 @@ class Daemon {
     manager_.tellReady(status_);
   }
 
-  // One line in the log.
-  void sayStatus() {
+  // Logs one line of status.
+  void logStatus() {
     context_.reportingServerQueue().async([this] {
       std::size_t sessions = 0;
       for (const auto& client : service_->getAllClients())
@@ -143,7 +143,7 @@ class Daemon {
     });
   }
 
-  // Every client is treated as lost, so that its started sessions stop and report.
+  // Ends the daemon in order. Every client is treated as lost, so that its started sessions stop and report.
   void endInOrder() {
     manager_.tellStopping("Finishing sessions and reports");
     runtimeWatcher_ = nullptr;
@@ -152,7 +152,7 @@ class Daemon {
     SerialQueue& queue = context_.reportingServerQueue();
     queue.async([this] {
       service_->stopSingleMessageSession();
-      TWReportingSystemMonitor::reset();  // while there is a queue for its handlers
+      TWReportingSystemMonitor::reset();  // while the queue of its handlers exists
     });
     queue.drain();
     flushSinks();
@@ -165,7 +165,7 @@ class Daemon {
     }
   }
 
-  // The directory may have been removed, and made again by somebody who knows nothing of what was in it.
+  // Restores what the daemon keeps in the directory, which may have been removed and made again without it.
   void restoreRuntimeDirectory() {
     listener_.restoreSocket();
     std::error_code error;
@@ -180,7 +180,7 @@ class Daemon {
     return platform;
   }
 
-  // No session stops; what the sinks already have is written.
+  // Ends the process without stopping sessions. What the sinks already have is written.
   [[noreturn]] void endOnKillRequest() {
     const MutexLock lock(killMutex_);
     manager_.tellStopping("Killed by a client; finishing reports");
@@ -191,14 +191,14 @@ class Daemon {
   void flushSinks() {
     context_.fileSinkQueue().drain();
     context_.linkReportQueues().drain();
-    (void)linkReport_.finish(kNetworkTimeout);  // what is lost is in the exporters' own log lines
-    (void)store_.flush(kFlushTimeout);          // a failure is in the store's own log lines
+    (void)linkReport_.finish(kNetworkTimeout);  // the exporters log what is lost
+    (void)store_.flush(kFlushTimeout);          // the store logs a failure
     capsa_.finish();
     diagnostics_.finish(kDiagnosticsTimeout);
   }
 
   const ServiceManager& manager_;
-  const std::string status_;  // for the service manager
+  const std::string status_;  // shown by the service manager
   LinuxPlatform& linux_;
   const std::string runtimeDirectory_;
   const LogCategory& log_;
@@ -215,8 +215,8 @@ class Daemon {
   std::shared_ptr<TWReportingService> service_;
   UnixSocketListener listener_;
   DbusListener dbusListener_;
-  Mutex killMutex_;                                   // two front ends may get the request at once
-  std::unique_ptr<DirectoryWatcher> runtimeWatcher_;  // last: it calls us
+  Mutex killMutex_;                                   // both listeners may get the kill request at once
+  std::unique_ptr<DirectoryWatcher> runtimeWatcher_;  // last, because it calls this object
 };
 
 sigset_t signalSet(std::initializer_list<int> numbers) {
@@ -226,39 +226,39 @@ sigset_t signalSet(std::initializer_list<int> numbers) {
   return signals;
 }
 
-// Blocked in every thread, so that main() alone takes them.
-sigset_t takenSignals() { return signalSet({SIGTERM, SIGINT, SIGHUP, SIGUSR1}); }
+// The signals that are blocked in every thread, so that only main() receives them.
+sigset_t handledSignals() { return signalSet({SIGTERM, SIGINT, SIGHUP, SIGUSR1}); }
 
-// Does what signals ask for, until one of them asks for the end.
+// Handles signals until one of them ends the daemon.
 void serveUntilEndSignal(Daemon& daemon) {
-  const sigset_t signals = takenSignals();
+  const sigset_t signals = handledSignals();
   for (;;) {
     int signal = 0;
     if (sigwait(&signals, &signal) != 0) continue;
     if (signal == SIGTERM || signal == SIGINT) break;
     if (signal == SIGHUP) daemon.reload();
-    if (signal == SIGUSR1) daemon.sayStatus();
+    if (signal == SIGUSR1) daemon.logStatus();
   }
-  // A second one finds its default action and ends the process at once.
+  // A second end signal has its default action, which ends the process at once.
   std::signal(SIGTERM, SIG_DFL);
   std::signal(SIGINT, SIG_DFL);
   const sigset_t ends = signalSet({SIGTERM, SIGINT});
   pthread_sigmask(SIG_UNBLOCK, &ends, nullptr);
 }
 
-// Each client takes a descriptor; the usual soft limit is far below what the system allows.
+// Each client takes a file descriptor, and the usual soft limit is far below the hard limit.
 void raiseDescriptorLimit() {
   rlimit limit{};
   if (getrlimit(RLIMIT_NOFILE, &limit) != 0) return;
   limit.rlim_cur = limit.rlim_max;
-  static_cast<void>(setrlimit(RLIMIT_NOFILE, &limit));  // the old limit does, too
+  static_cast<void>(setrlimit(RLIMIT_NOFILE, &limit));  // a failure leaves the old limit, which is usable
 }
 
 int run() {
-  const sigset_t signals = takenSignals();
+  const sigset_t signals = handledSignals();
   pthread_sigmask(SIG_BLOCK, &signals, nullptr);
   std::signal(SIGPIPE, SIG_IGN);
-  std::signal(SIGXFSZ, SIG_IGN);  // a file that may not grow is a write that fails
+  std::signal(SIGXFSZ, SIG_IGN);  // writing past the file size limit then fails instead of ending the process
   raiseDescriptorLimit();
 
   const Directories directories = Directories::fromEnvironment();
