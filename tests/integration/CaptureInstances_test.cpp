@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What the capture worker's instances leave on the disk when it is the real service that they ask.
+// What the capture worker's instances write to the disk with the real capture service.
 #include <filesystem>
 #include <functional>
 #include <gmock/gmock.h>
@@ -26,16 +26,16 @@ using ::testing::Contains;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
-constexpr std::chrono::seconds kGenerous{30};
+constexpr std::chrono::seconds kTimeout{30};
 
 class CaptureInstancesTest : public CapsaTest {
  protected:
-  // On the work queue, as everything that instances do.
+  // Instances are used on the work queue.
   void onWorkQueue(std::function<void()> work) {
     context->reportingServerQueue().async(std::move(work));
     test.queues.runAll();
   }
-  // What the worker does when an instance's symptom was seen often and long enough.
+  // Does what the worker does when an instance has seen its symptom often and long enough.
   void fire(TWReportingSessionCapsaWorkerInstance& instance, AudioEventCategory category,
             AudioEventType type) {
     onWorkQueue([&] {
@@ -43,10 +43,10 @@ class CaptureInstancesTest : public CapsaTest {
       instance.fire(TWReportingSessionMessage({{"n", 1}}, category, type));
     });
   }
-  // The captures that are on the disk in the end.
+  // Ends the services and returns the captures on the disk.
   std::vector<std::string> captures() {
     capsa.finish();
-    store.finish(kGenerous);
+    store.finish(kTimeout);
     std::vector<std::string> names;
     for (const auto& entry : items.list(DiagnosticKind::kCapture)) names.push_back(entry.name);
     return names;
@@ -96,7 +96,7 @@ TEST_F(CaptureInstancesTest, AQuietAlarmWhoseSessionOutlivesTheMinuteIsCaptured)
   EXPECT_EQ(request(identifier).number("duration"), 60.0);
 }
 
-TEST_F(CaptureInstancesTest, AQuietAlarmWhoseSessionEndsWithinTheMinuteIsNot) {
+TEST_F(CaptureInstancesTest, AQuietAlarmWhoseSessionEndsWithinTheMinuteIsNotCaptured) {
   TWReportingCapsaWorkerInstanceAlarmLowRMS instance(session);
   fire(instance, kCategoryError, kTypeIssueDetector);
   test.clock.advance(59.0);
@@ -105,14 +105,14 @@ TEST_F(CaptureInstancesTest, AQuietAlarmWhoseSessionEndsWithinTheMinuteIsNot) {
   EXPECT_THAT(captures(), IsEmpty());
 }
 
-TEST_F(CaptureInstancesTest, ACaptureThatTheServiceRefusesLeavesNoneReturnedAndNothingToCancel) {
+TEST_F(CaptureInstancesTest, ARefusedCaptureLeavesNoneReturnedAndNothingToCancel) {
   TWReportingCapsaWorkerInstanceAlarmLowRMS first(session);
   TWReportingCapsaWorkerInstanceAlarmLowRMS second(session);
   fire(first, kCategoryError, kTypeIssueDetector);
   fire(second, kCategoryError, kTypeIssueDetector);
   EXPECT_EQ(second.workerState().currentCapsaSessionIdentifier, "NONE_RETURNED");
   EXPECT_THAT(infos(), Contains("Failed starting capsa session. reason=kFaultsignErrorRequestThrottled"));
-  onWorkQueue([&] { second.stop(); });  // the first one's goes on
+  onWorkQueue([&] { second.stop(); });  // does not cancel the first one's capture
   test.clock.advance(60.0);
   EXPECT_THAT(captures(), ElementsAre(first.workerState().currentCapsaSessionIdentifier.value_or("none")));
 }

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The whole service with the real capture service behind it: clients whose sessions show symptoms, one after
-// the other and at once, and what is captured of it on one day.
+// The whole service with the real capture service: which captures are made in a day when clients' sessions
+// show symptoms, one after the other and at once.
 #include <algorithm>
 #include <gmock/gmock.h>
 #include <memory>
@@ -29,7 +29,7 @@ using ::testing::Not;
 using ::testing::SizeIs;
 using ::testing::UnorderedElementsAre;
 
-constexpr std::chrono::seconds kGenerous{30};
+constexpr std::chrono::seconds kTimeout{30};
 constexpr AudioServiceType kLongFormAudio = 7;
 constexpr char kThrottled[] = "Failed starting capsa session. reason=kFaultsignErrorRequestThrottled";
 constexpr char kLimit[] = "Failed starting capsa session. reason=kFaultsignErrorDailyLimitExceeded";
@@ -43,7 +43,7 @@ class CaptureSourcesTest : public ServiceTest {
   }
   ~CaptureSourcesTest() override { end(); }
 
-  // A daemon, over the same directories when there was one before.
+  // Begins a daemon. A second call ends the first daemon and begins one with the same directories.
   void begin() {
     end();
     store.emplace(directory.path(), std::vector<std::shared_ptr<DiagnosticCollector>>{}, json,
@@ -52,7 +52,7 @@ class CaptureSourcesTest : public ServiceTest {
     context.emplace(test.platformWith(*capsa), allWorkerClasses());
     startService();
   }
-  // In the order of an orderly end: clients, sessions, captures.
+  // Ends the daemon in order: clients, sessions, captures.
   void end() {
     clients.clear();
     messaging.shutDown();
@@ -60,12 +60,12 @@ class CaptureSourcesTest : public ServiceTest {
     service.reset();
     context.reset();
     if (capsa) capsa->finish();
-    if (store) store->finish(kGenerous);
+    if (store) store->finish(kTimeout);
     capsa.reset();
     store.reset();
   }
 
-  // A session of a client of its own.
+  // A session that has a client of its own.
   struct Source {
     MemoryClient* client;
     ReporterID reporterID;
@@ -81,21 +81,21 @@ class CaptureSourcesTest : public ServiceTest {
     return source;
   }
   void send(const Source& source, ValueMap payload, AudioEventCategory category, AudioEventType type) {
-    payload.set("n", ++messages);  // no repeat
+    payload.set("n", ++messages);  // so that no message is redundant
     ask(*source.client, "sendMessage", {payload, category, type, ValueArray{source.reporterID}});
   }
   void stop(const Source& source) { ask(*source.client, "stopReportingSessionForID", {source.reporterID}); }
 
-  void soundQuietly(const Source& source) {
+  void reportLowRms(const Source& source) {
     send(source, {{"issue_type", "LowRMS"}}, kCategoryError, kTypeIssueDetector);
   }
-  // An alarm that is noticed to be quiet, sixteen seconds after it began.
+  // Starts an alarm whose low volume is detected sixteen seconds after its start.
   Source quietAlarm() {
     const Source source = startSession(kServiceAlarms);
-    soundQuietly(source);
-    soundQuietly(source);
+    reportLowRms(source);
+    reportLowRms(source);
     test.clock.advance(16.0);
-    soundQuietly(source);
+    reportLowRms(source);
     return source;
   }
   void leakHaptics(const Source& source) {
@@ -107,7 +107,7 @@ class CaptureSourcesTest : public ServiceTest {
     const auto lines = infos();
     return static_cast<std::size_t>(std::count(lines.begin(), lines.end(), line));
   }
-  // What is on the disk when the daemon has ended: the services that captures are about.
+  // Ends the daemon and returns the services of the captures on the disk.
   std::vector<std::string> captured() {
     end();
     std::vector<std::string> services;
@@ -134,14 +134,14 @@ class CaptureSourcesTest : public ServiceTest {
   int messages = 0;
 };
 
-TEST_F(CaptureSourcesTest, AnAlarmThatOutlivesTheMinuteIsCaptured) {
+TEST_F(CaptureSourcesTest, AnAlarmThatLastsLongerThanAMinuteIsCaptured) {
   quietAlarm();
   test.clock.advance(60.0);
   run();
   EXPECT_THAT(captured(), ElementsAre("alarms"));
 }
 
-TEST_F(CaptureSourcesTest, OfSeveralSourcesOneIsCancelledAndTheOthersAreCaptured) {
+TEST_F(CaptureSourcesTest, OneOfSeveralSourcesIsCancelledAndTheOthersAreCaptured) {
   const Source music = startSession(kLongFormAudio);
   leakHaptics(music);
   const Source heard = quietAlarm();
@@ -154,8 +154,8 @@ TEST_F(CaptureSourcesTest, OfSeveralSourcesOneIsCancelledAndTheOthersAreCaptured
   EXPECT_THAT(captured(), UnorderedElementsAre("alarms", "longformaudio"));
 }
 
-// Of one service and kind of message all sessions are one signature: their sessions are made by the change of
-// the service type, and have no process.
+// All sessions of one service and kind of message have one signature. A change of the service type has made
+// these sessions, so they have no process name.
 TEST_F(CaptureSourcesTest, ASecondAlarmWithinAMinuteOfAPendingOneIsThrottled) {
   quietAlarm();
   quietAlarm();  // sixteen seconds later
@@ -165,7 +165,7 @@ TEST_F(CaptureSourcesTest, ASecondAlarmWithinAMinuteOfAPendingOneIsThrottled) {
   EXPECT_THAT(captured(), ElementsAre("alarms"));
 }
 
-// Five minutes were once to pass, so that an hour of alarms left most of them out.
+// Five minutes had to pass once, so that most alarms of an hour were not captured.
 TEST_F(CaptureSourcesTest, AnAlarmAMinuteAfterAnotherIsCapturedToo) {
   quietAlarm();
   test.clock.advance(44.0);
@@ -176,7 +176,7 @@ TEST_F(CaptureSourcesTest, AnAlarmAMinuteAfterAnotherIsCapturedToo) {
   EXPECT_THAT(captured(), ElementsAre("alarms", "alarms"));
 }
 
-// A cancelled capture once kept the next alarm from being captured.
+// A cancelled capture once prevented the next alarm's capture.
 TEST_F(CaptureSourcesTest, AnAlarmThatWasHeardDoesNotThrottleTheNext) {
   for (int n = 0; n < 3; ++n) stop(quietAlarm());
   quietAlarm();
@@ -198,22 +198,22 @@ TEST_F(CaptureSourcesTest, TwentyAlarmsADayAreCapturedAndTheNextOnesAreNot) {
   EXPECT_THAT(captured(), SizeIs(20));
 }
 
-TEST_F(CaptureSourcesTest, TheDaysNumberGoesOnAfterARestart) {
-  const auto sound = [this](int count) {
+TEST_F(CaptureSourcesTest, TheCountOfTheDayContinuesAfterARestart) {
+  const auto startAlarms = [this](int count) {
     for (int n = 0; n < count; ++n) {
       quietAlarm();
       test.clock.advance(60.0);
       run();
     }
   };
-  sound(12);
+  startAlarms(12);
   begin();
-  sound(12);
+  startAlarms(12);
   EXPECT_EQ(countOf(kLimit), 4U);
   EXPECT_THAT(captured(), SizeIs(20));
 }
 
-TEST_F(CaptureSourcesTest, CancelledOnesUseUpTheDayToo) {
+TEST_F(CaptureSourcesTest, CancelledCapturesCountForTheDayToo) {
   for (int n = 0; n < 20; ++n) stop(quietAlarm());
   quietAlarm();
   EXPECT_EQ(countOf(kLimit), 1U);
@@ -222,7 +222,7 @@ TEST_F(CaptureSourcesTest, CancelledOnesUseUpTheDayToo) {
   EXPECT_THAT(captured(), IsEmpty());
 }
 
-TEST_F(CaptureSourcesTest, ARepeatOfALargeMessageDoesNotBringTheAlarmNearerToItsCapture) {
+TEST_F(CaptureSourcesTest, ARedundantLargeMessageDoesNotCountTowardsACapture) {
   const Source alarm = startSession(kServiceAlarms);
   const ValueMap large{{"issue_type", "LowRMS"},
                        {"samples", std::string(std::size_t{200} << 10, 'x')},
@@ -232,7 +232,7 @@ TEST_F(CaptureSourcesTest, ARepeatOfALargeMessageDoesNotBringTheAlarmNearerToIts
         {large, kCategoryError, kTypeIssueDetector, ValueArray{alarm.reporterID}});
     test.clock.advance(10.0);
   }
-  soundQuietly(alarm);  // the second message that differs
+  reportLowRms(alarm);  // the second message that differs
   test.clock.advance(600.0);
   run();
   EXPECT_THAT(captured(), IsEmpty());

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The system monitor and its workers on a real work queue, with everybody who may reach them at once.
+// The system monitor and its workers on a real work queue, with all threads that may use them at once.
 #include <atomic>
 #include <chrono>
 #include <cstdlib>
@@ -27,34 +27,34 @@ namespace tonewerk {
 namespace {
 
 constexpr int kRounds = 400;
-constexpr std::chrono::seconds kPatience{60};
+constexpr std::chrono::seconds kTimeout{60};
 constexpr std::size_t kMaxSessions = 8;
 
 constexpr char kRinger[] = "com.orvane.homedeck.ringerstate";
 constexpr char kReporting[] = "com.orvane.tonewerk.reporting";
 
-// Does to the sessions what the test wants whenever one of them gets a message: from inside the map's lock
-// when the system monitor's worker sent it. On the work queue.
-class Meddler final : public TWReportingSessionWorkerConsumerProtocol {
+// Changes sessions as the test wants whenever one of them gets a message. When the system monitor's worker
+// has sent the message, this happens inside the map's lock. Used on the work queue.
+class SessionChanger final : public TWReportingSessionWorkerConsumerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
   const TWReportingSessionWorkerClass& workerClass() const override { return kWorkerClass; }
-  explicit Meddler(const std::shared_ptr<TWReportingSession>& owner) { session = owner; }
+  explicit SessionChanger(const std::shared_ptr<TWReportingSession>& owner) { session = owner; }
   bool handleMessage(const TWReportingSessionMessage&) override {
-    if (meddle) meddle();
+    if (change) change();
     return true;
   }
 
-  static std::function<void()> meddle;
+  static std::function<void()> change;
 };
-const TWReportingSessionWorkerClass Meddler::kWorkerClass = workerClassOf<Meddler>("Meddler");
-std::function<void()> Meddler::meddle;
+const TWReportingSessionWorkerClass SessionChanger::kWorkerClass = workerClassOf<SessionChanger>("Meddler");
+std::function<void()> SessionChanger::change;
 
-// Sessions that come, start, stop and go in an order that nobody chose. On the work queue.
+// Makes, starts, stops and removes sessions in random order. Used on the work queue.
 class Sessions {
  public:
   void change() {
-    if (depth_ >= 3) return;  // a start sends messages, which come here again
+    if (depth_ >= 3) return;  // a start sends messages, which call this again
     ++depth_;
     switch (random_() % 4) {
       case 0:
@@ -85,7 +85,7 @@ class Sessions {
     session->start();
   }
   Session any() { return sessions_.empty() ? nullptr : sessions_[random_() % sessions_.size()]; }
-  // Without a stop, as a client that is lost may leave it.
+  // Removes a session without a stop, as the loss of a client may do.
   void removeAny() {
     if (sessions_.empty()) return;
     const auto at = sessions_.begin() + static_cast<std::ptrdiff_t>(random_() % sessions_.size());
@@ -100,14 +100,14 @@ class Sessions {
   int changes_ = 0;
 };
 
-// The platform in memory, with the system's threads for its queues.
+// The platform in memory, but with queues that have threads.
 struct Rig {
   Rig() {
     test.log.setThreshold(LogLevel::kError);
     const Platform doubles =
         test.platformWith(test.log, test.tracePoints, test.clock, queues, test.metricon, test.linkReport);
-    context.emplace(doubles,
-                    Classes{&Meddler::kWorkerClass, &TWReportingSessionSystemMonitorWorker::kWorkerClass});
+    context.emplace(doubles, Classes{&SessionChanger::kWorkerClass,
+                                     &TWReportingSessionSystemMonitorWorker::kWorkerClass});
   }
 
   using Classes = std::vector<const TWReportingSessionWorkerClass*>;
@@ -116,12 +116,12 @@ struct Rig {
   std::optional<TWReportingContext> context;
 };
 
-// Runs them all at once; a deadlock ends the process, since its threads cannot be joined.
+// Runs all pieces at once. A deadlock ends the process, because the threads cannot be joined.
 void runTogether(const std::vector<std::function<void()>>& pieces) {
   std::vector<std::future<void>> ends;
   for (const auto& piece : pieces) ends.push_back(std::async(std::launch::async, piece));
   for (std::future<void>& end : ends) {
-    if (end.wait_for(kPatience) == std::future_status::ready) continue;
+    if (end.wait_for(kTimeout) == std::future_status::ready) continue;
     ADD_FAILURE() << "some threads wait for each other";
     std::abort();
   }
@@ -130,7 +130,7 @@ void runTogether(const std::vector<std::function<void()>>& pieces) {
 TEST(SystemMonitorThreadsTest, NoOrderOfStartsChangesAndStopsDeadlocks) {
   Rig rig;
   Sessions sessions;
-  Meddler::meddle = [&] { sessions.change(); };
+  SessionChanger::change = [&] { sessions.change(); };
   SerialQueue& queue = TWReportingUtilityGetReportingServerQueue();
   TWReportingSystemMonitor::initializeWithQueue(queue);
 
@@ -153,7 +153,7 @@ TEST(SystemMonitorThreadsTest, NoOrderOfStartsChangesAndStopsDeadlocks) {
         queue.async([&] { sessions.change(); });
         queue.drain();
       }),
-      // Somebody who looks from outside, and observes.
+      // A thread of its own that reads and observes the map.
       repeat([&](int) {
         const auto map = TWReportingSystemMonitor::getSystemMonitorDictionary();
         if (map == nullptr) return;
@@ -177,7 +177,7 @@ TEST(SystemMonitorThreadsTest, NoOrderOfStartsChangesAndStopsDeadlocks) {
   });
   queue.drain();
   EXPECT_TRUE(rig.test.notifications.registered().empty());
-  Meddler::meddle = nullptr;
+  SessionChanger::change = nullptr;
 }
 
 }  // namespace

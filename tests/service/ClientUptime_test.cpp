@@ -36,7 +36,7 @@ TEST_F(ClientUptimeTest, WithoutAStartDateItIsMinusOneSecond) {
                           "invalidationHandler: connection exited process=player uptime_sec=-1"));
 }
 
-TEST_F(ClientUptimeTest, FromAStartDateInTheFutureItIsTheIntervalAndLogged) {
+TEST_F(ClientUptimeTest, WithAStartDateInTheFutureItIsTheDifferenceAndIsLogged) {
   sendClientUptime(11, test.clock.now() + 100, "player");
   ASSERT_THAT(events(), SizeIs(1));
   EXPECT_EQ(events()[0].number("seconds"), 100.0);
@@ -52,8 +52,8 @@ TEST_F(ClientUptimeTest, WithoutAProcessNameNothingIsSent) {
                           "clientProcessName is nil. clientpid=11"));
 }
 
-// A probe that connects and goes at once is no failure.
-TEST_F(ClientUptimeTest, AClientThatWasGoneBeforeItWasKnownIsNoError) {
+// Such a client may only check whether the daemon listens.
+TEST_F(ClientUptimeTest, AClientThatLeftBeforeItWasRegisteredIsNotAnError) {
   sendClientUptime(11, std::nullopt, std::nullopt);
   EXPECT_THAT(test.log.textsOf("twrs", LogLevel::kInfo), SizeIs(3));
   EXPECT_THAT(test.log.textsAt(LogLevel::kError), IsEmpty());

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What becomes of a client's playback and recording when its session stops, through the whole service with
-// every worker: the figures are computed by hand.
+// The summaries of a client's playback and recording when its session stops, made by the whole service with
+// all workers. The expected numbers were computed by hand.
 #include <cmath>
 #include <gtest/gtest.h>
 #include <memory>
@@ -22,12 +22,12 @@ using ::testing::SizeIs;
 constexpr ReporterID kSession = 77;
 constexpr AudioServiceType kLongFormAudio = 7;
 constexpr AudioEventCategory kPlayback = 4;
-constexpr double kBegin = ManualClock::kStart + 100.0;  // of what is played, after the session's start
+constexpr double kBegin = ManualClock::kStart + 100.0;  // when playback begins, after the session's start
 
 class SessionSummariesTest : public ServiceTest {
  protected:
   SessionSummariesTest() : ServiceTest(allWorkerClasses()) {
-    makeInternalBuild();  // with files
+    makeInternalBuild();  // so that JSON files are written
     create(*client, kSession);
     ask(*client, "setServiceType", {kLongFormAudio, kSession});
     ask(*client, "setConfiguration",
@@ -36,10 +36,11 @@ class SessionSummariesTest : public ServiceTest {
   }
 
   void startAgain() { ask(*client, "startReportingSessionForID", {kSession}); }
-  // Messages that follow each other differ, so none is redundant. `at` is its time.
-  void say(ValueMap says, const Value& at) {
-    says.set("twreporting_timestamp", at);
-    ask(*client, "sendMessage", {says, kPlayback, static_cast<int>(kTypeStart), Value(ValueArray{kSession})});
+  // Consecutive messages must differ, so that none is redundant. `at` is the message's time.
+  void send(ValueMap payload, const Value& at) {
+    payload.set("twreporting_timestamp", at);
+    ask(*client, "sendMessage",
+        {payload, kPlayback, static_cast<int>(kTypeStart), Value(ValueArray{kSession})});
   }
   void stop() { ask(*client, "stopReportingSessionForID", {kSession}); }
 
@@ -71,13 +72,13 @@ class SessionSummariesTest : public ServiceTest {
 
 const Value kNoTime(std::nan(""));
 
-// Dates as times.
+// Times that are dates.
 
-TEST_F(SessionSummariesTest, ADateAsATimeReadsAsItsSeconds) {
-  say({{"session_output_running", true}, {"QMSessionVolume", 0.3}}, Date{kBegin});
-  say({{"session_output_running", false}}, Date{kBegin + 42.0});
-  say({{"session_input_running", true}}, Date{kBegin + 50.0});
-  say({{"session_input_running", false}}, Date{kBegin + 56.5});
+TEST_F(SessionSummariesTest, ADateCountsAsItsSeconds) {
+  send({{"session_output_running", true}, {"QMSessionVolume", 0.3}}, Date{kBegin});
+  send({{"session_output_running", false}}, Date{kBegin + 42.0});
+  send({{"session_input_running", true}}, Date{kBegin + 50.0});
+  send({{"session_input_running", false}}, Date{kBegin + 56.5});
   stop();
   EXPECT_THAT(played(), ElementsAre("42@0.3 1/1"));
   EXPECT_EQ(summaries("Volume").at(0).text("QMSessionVolumeBucketed"), "0.3125");
@@ -86,77 +87,77 @@ TEST_F(SessionSummariesTest, ADateAsATimeReadsAsItsSeconds) {
   EXPECT_EQ(summaries("Input").at(0).text("inputrunning_secondsBucketed"), "5");
 }
 
-TEST_F(SessionSummariesTest, DatesAndNumbersAreTimesOfOneLine) {
-  say({{"session_output_running", false}}, Date{kBegin + 10.0});  // the later one came first
-  say({{"session_output_running", true}, {"QMSessionVolume", 0.5}}, kBegin);
-  say({{"QMSessionVolume", 0.75}}, Date{kBegin + 4.0});
+TEST_F(SessionSummariesTest, DatesAndNumbersAreComparableTimes) {
+  send({{"session_output_running", false}}, Date{kBegin + 10.0});  // the later message is sent first
+  send({{"session_output_running", true}, {"QMSessionVolume", 0.5}}, kBegin);
+  send({{"QMSessionVolume", 0.75}}, Date{kBegin + 4.0});
   stop();
   EXPECT_THAT(played(), ElementsAre("4@0.5 1/2", "6@0.75 2/2"));
 }
 
-// The session takes a date of more than a year ago for as wrong as a number.
-TEST_F(SessionSummariesTest, ADateThatIsTooOldIsReplacedAndKept) {
-  say({{"a", 1}}, Date{ManualClock::kStart - 366.0 * 86'400.0});
+// A date of more than a year ago is invalid, like such a number.
+TEST_F(SessionSummariesTest, ADateThatIsTooOldIsReplacedAndKeptAsInvalid) {
+  send({{"a", 1}}, Date{ManualClock::kStart - 366.0 * 86'400.0});
   const auto events = test.metricon.eventsNamed("com.orvane.longformaudio.Playback.Start");
   ASSERT_THAT(events, SizeIs(1));
   EXPECT_EQ(events[0].number("twreporting_timestamp"), test.clock.now());
   EXPECT_EQ(*events[0].find("invalid_timestamp"), Value(Date{ManualClock::kStart - 366.0 * 86'400.0}));
 }
 
-// Times that are no numbers.
+// Times that are not numbers.
 
-TEST_F(SessionSummariesTest, AMessageWithoutATimeThatIsANumberComesFirst) {
-  say({{"session_output_running", true}, {"QMSessionVolume", 0.5}}, kBegin);
-  say({{"QMSessionVolume", 0.75}}, kNoTime);
-  say({{"session_output_running", false}}, kBegin + 10.0);
+TEST_F(SessionSummariesTest, AMessageWhoseTimeIsNotANumberComesFirst) {
+  send({{"session_output_running", true}, {"QMSessionVolume", 0.5}}, kBegin);
+  send({{"QMSessionVolume", 0.75}}, kNoTime);
+  send({{"session_output_running", false}}, kBegin + 10.0);
   stop();
   EXPECT_THAT(played(), ElementsAre("10@0.5 1/1"));
 }
 
-TEST_F(SessionSummariesTest, AStretchWhoseLengthIsNoNumberIsTooShort) {
-  say({{"session_output_running", true},
-       {"session_input_running", true},
-       {"gather_session", 1},
-       {"QMSessionVolume", 0.5}},
-      kNoTime);
-  say({{"session_output_running", false}, {"session_input_running", false}, {"gather_session", 1}},
-      kBegin + 10.0);
+TEST_F(SessionSummariesTest, APeriodWhoseLengthIsNotANumberIsTooShort) {
+  send({{"session_output_running", true},
+        {"session_input_running", true},
+        {"gather_session", 1},
+        {"QMSessionVolume", 0.5}},
+       kNoTime);
+  send({{"session_output_running", false}, {"session_input_running", false}, {"gather_session", 1}},
+       kBegin + 10.0);
   stop();
   EXPECT_THAT(played(), IsEmpty());
   EXPECT_THAT(gathered(), IsEmpty());
   EXPECT_THAT(recorded(), IsEmpty());
 }
 
-TEST_F(SessionSummariesTest, AStopWithoutATimeThatIsANumberEndsNothing) {
-  say({{"session_output_running", true}, {"QMSessionVolume", 0.5}}, kBegin);
-  say({{"session_output_running", false}}, kNoTime);
+TEST_F(SessionSummariesTest, AnEndWhoseTimeIsNotANumberEndsNoPeriod) {
+  send({{"session_output_running", true}, {"QMSessionVolume", 0.5}}, kBegin);
+  send({{"session_output_running", false}}, kNoTime);
   stop();
   EXPECT_THAT(played(), IsEmpty());
 }
 
-TEST_F(SessionSummariesTest, AnInfiniteTimeMakesAnInfiniteStretchAndNoCrash) {
-  say({{"session_output_running", true}, {"QMSessionVolume", 0.5}}, kBegin);
-  say({{"session_output_running", false}}, HUGE_VAL);
+TEST_F(SessionSummariesTest, AnInfiniteTimeMakesAnInfinitePeriod) {
+  send({{"session_output_running", true}, {"QMSessionVolume", 0.5}}, kBegin);
+  send({{"session_output_running", false}}, HUGE_VAL);
   stop();
   EXPECT_THAT(played(), ElementsAre("inf@0.5 1/1"));
   EXPECT_EQ(summaries("Volume").at(0).text("play_secondsBucketed"), "18000");
 }
 
-// Several producers in one stop.
+// Several producers at one stop.
 
 TEST_F(SessionSummariesTest, OneStopYieldsVolumeGatherAndInputSummaries) {
-  say({{"session_output_running", true},
-       {"session_input_running", true},
-       {"gather_session", 1},
-       {"QMSessionVolume", 0.5},
-       {"session_selected_format", "AAC"},
-       {"active_devices", "Speaker"},
-       {"mFormatID", "aac"},
-       {"mChannelsPerFrame", 2}},
-      kBegin);
-  say({{"QMSessionVolume", 0.75}}, kBegin + 12.0);
-  say({{"session_output_running", false}, {"session_input_running", false}, {"gather_session", 1}},
-      kBegin + 18.0);
+  send({{"session_output_running", true},
+        {"session_input_running", true},
+        {"gather_session", 1},
+        {"QMSessionVolume", 0.5},
+        {"session_selected_format", "AAC"},
+        {"active_devices", "Speaker"},
+        {"mFormatID", "aac"},
+        {"mChannelsPerFrame", 2}},
+       kBegin);
+  send({{"QMSessionVolume", 0.75}}, kBegin + 12.0);
+  send({{"session_output_running", false}, {"session_input_running", false}, {"gather_session", 1}},
+       kBegin + 18.0);
   stop();
   context->fileSinkQueue().drain();
   EXPECT_THAT(played(), ElementsAre("12@0.5 1/2", "6@0.75 2/2"));
@@ -182,15 +183,15 @@ TEST_F(SessionSummariesTest, OneStopYieldsVolumeGatherAndInputSummaries) {
                                    "Session_Generic_Summary_1", "Input_Summary_1"));
 }
 
-// The volume's summaries lie among the messages that the gather worker walks, with devices of before.
+// The gather worker also goes through the volume summaries, which name devices that were active earlier.
 TEST_F(SessionSummariesTest, VolumeSummariesDoNotDisturbTheGatherSummary) {
-  say({{"session_output_running", true},
-       {"gather_session", 1},
-       {"QMSessionVolume", 0.5},
-       {"active_devices", "Speaker"}},
-      kBegin);
-  say({{"active_devices", "Headphones"}}, kBegin + 3.0);
-  say({{"session_output_running", false}, {"gather_session", 1}}, kBegin + 10.0);
+  send({{"session_output_running", true},
+        {"gather_session", 1},
+        {"QMSessionVolume", 0.5},
+        {"active_devices", "Speaker"}},
+       kBegin);
+  send({{"active_devices", "Headphones"}}, kBegin + 3.0);
+  send({{"session_output_running", false}, {"gather_session", 1}}, kBegin + 10.0);
   stop();
   EXPECT_THAT(played(), ElementsAre("3@0.5 1/2", "7@0.5 2/2"));
   EXPECT_THAT(gathered(), ElementsAre("3 1/2", "7 2/2"));
@@ -200,62 +201,62 @@ TEST_F(SessionSummariesTest, VolumeSummariesDoNotDisturbTheGatherSummary) {
 
 // A second start and stop.
 
-TEST_F(SessionSummariesTest, ASecondRunIsSummedUpByItselfInTheContextOfTheFirst) {
-  say({{"session_output_running", true}, {"QMSessionVolume", 0.25}, {"active_devices", "Speaker"}}, kBegin);
-  say({{"session_output_running", false}}, kBegin + 10.0);
+TEST_F(SessionSummariesTest, ASecondRunIsSummarisedAloneWithTheStateOfTheFirst) {
+  send({{"session_output_running", true}, {"QMSessionVolume", 0.25}, {"active_devices", "Speaker"}}, kBegin);
+  send({{"session_output_running", false}}, kBegin + 10.0);
   stop();
   EXPECT_THAT(played(), ElementsAre("10@0.25 1/1"));
   test.metricon.clear();
 
   startAgain();
-  say({{"session_output_running", true}}, kBegin + 100.0);
-  say({{"session_output_running", false}}, kBegin + 107.0);
+  send({{"session_output_running", true}}, kBegin + 100.0);
+  send({{"session_output_running", false}}, kBegin + 107.0);
   stop();
   EXPECT_THAT(played(), ElementsAre("7@0.25 1/1"));
   EXPECT_EQ(summaries("Volume").at(0).text("active_devices"), "Speaker");
 }
 
-// What the session received last is where the walk begins, its own messages of this run included.
-TEST_F(SessionSummariesTest, TheWalkBeginsWithTheSessionsLastState) {
-  say({{"session_output_running", true}}, kBegin);
-  say({{"QMSessionVolume", 0.75}, {"mFormatID", "aac"}}, kBegin + 4.0);
-  say({{"session_output_running", false}}, kBegin + 9.0);
+// A summary begins with the session's previous values, which include the messages of the run itself.
+TEST_F(SessionSummariesTest, ASummaryBeginsWithTheSessionsLastState) {
+  send({{"session_output_running", true}}, kBegin);
+  send({{"QMSessionVolume", 0.75}, {"mFormatID", "aac"}}, kBegin + 4.0);
+  send({{"session_output_running", false}}, kBegin + 9.0);
   stop();
-  EXPECT_THAT(played(), ElementsAre("9@0.75 1/1"));  // the volume was 0.75 from the beginning
+  EXPECT_THAT(played(), ElementsAre("9@0.75 1/1"));  // the volume counts as 0.75 from the start
   EXPECT_EQ(summaries("Volume").at(0).text("mFormatID"), "aac");
 }
 
-TEST_F(SessionSummariesTest, OutputThatTheFirstRunLeftOpenIsNotTheSecondOnes) {
-  say({{"session_output_running", true}, {"gather_session", 1}, {"QMSessionVolume", 0.5}}, kBegin);
+TEST_F(SessionSummariesTest, OutputLeftRunningInTheFirstRunDoesNotCountInTheSecond) {
+  send({{"session_output_running", true}, {"gather_session", 1}, {"QMSessionVolume", 0.5}}, kBegin);
   stop();
   EXPECT_THAT(played(), IsEmpty());
   startAgain();
-  say({{"session_output_running", false}, {"gather_session", 1}}, kBegin + 30.0);
+  send({{"session_output_running", false}, {"gather_session", 1}}, kBegin + 30.0);
   stop();
   EXPECT_THAT(played(), IsEmpty());
   EXPECT_THAT(gathered(), IsEmpty());
 }
 
-// Between the open stretch's begin and its end the previous values have moved on to the end itself.
-TEST_F(SessionSummariesTest, TheFinalMessageOfASecondRunEndsNoOpenStretchOfTheFirst) {
-  say({{"session_output_running", true}, {"gather_session", 1}, {"QMSessionVolume", 0.5}}, kBegin);
+// By the time of the stop, the previous values are those of the period's end, not of its beginning.
+TEST_F(SessionSummariesTest, TheFinalMessageOfASecondRunEndsNoPeriodOfTheFirst) {
+  send({{"session_output_running", true}, {"gather_session", 1}, {"QMSessionVolume", 0.5}}, kBegin);
   stop();
   startAgain();
-  say({{"session_duration", 30.0}}, kBegin + 30.0);
+  send({{"session_duration", 30.0}}, kBegin + 30.0);
   stop();
   EXPECT_THAT(played(), IsEmpty());
   EXPECT_THAT(gathered(), IsEmpty());
 }
 
-TEST_F(SessionSummariesTest, InputThatTheFirstRunLeftOpenBeginsAnewInTheSecond) {
-  say({{"session_input_running", true}, {"vp_config_operation_mode", "voice"}, {"active_devices", "Mic"}},
-      kBegin);
+TEST_F(SessionSummariesTest, InputLeftRunningInTheFirstRunStartsAgainInTheSecond) {
+  send({{"session_input_running", true}, {"vp_config_operation_mode", "voice"}, {"active_devices", "Mic"}},
+       kBegin);
   stop();
   EXPECT_THAT(recorded(), IsEmpty());
   startAgain();
-  say({{"session_input_running", false}}, kBegin + 60.0);
-  say({{"session_input_running", true}}, kBegin + 70.0);
-  say({{"session_input_running", false}}, kBegin + 75.0);
+  send({{"session_input_running", false}}, kBegin + 60.0);
+  send({{"session_input_running", true}}, kBegin + 70.0);
+  send({{"session_input_running", false}}, kBegin + 75.0);
   stop();
   EXPECT_THAT(recorded(), ElementsAre("5 1/1"));
   EXPECT_EQ(summaries("Input").at(0).text("vp_config_operation_mode"), "voice");
@@ -265,9 +266,9 @@ TEST_F(SessionSummariesTest, InputThatTheFirstRunLeftOpenBeginsAnewInTheSecond) 
 TEST_F(SessionSummariesTest, SummariesOfTheFirstRunDoNotCountInTheSecond) {
   for (const double begin : {kBegin, kBegin + 100.0, kBegin + 200.0}) {
     test.metricon.clear();
-    say({{"session_output_running", true}, {"gather_session", 1}, {"QMSessionVolume", 0.5}}, begin);
-    say({{"QMSessionVolume", 0.75}}, begin + 2.0);
-    say({{"session_output_running", false}, {"gather_session", 1}}, begin + 5.0);
+    send({{"session_output_running", true}, {"gather_session", 1}, {"QMSessionVolume", 0.5}}, begin);
+    send({{"QMSessionVolume", 0.75}}, begin + 2.0);
+    send({{"session_output_running", false}, {"gather_session", 1}}, begin + 5.0);
     stop();
     EXPECT_THAT(played(), ElementsAre("2@0.5 1/2", "3@0.75 2/2"));
     EXPECT_THAT(gathered(), ElementsAre("5 1/1"));

@@ -29,7 +29,7 @@ class RequestTest : public ServiceTest {
 
   Value validityOf(ReporterID reporterID) { return askOnce(*client, "reporterIDValid", {reporterID}); }
 
-  // What Metricon's stand-in got, as the value under "a".
+  // The messages that the Metricon test worker has got since the last call, as "a=" and their value.
   std::vector<std::string> delivered() {
     std::vector<std::string> got;
     for (const std::string& event : journal.take()) {
@@ -66,7 +66,7 @@ TEST_F(RequestTest, CreateMakesASessionOfTheClient) {
   EXPECT_THAT(test.tracePoints.codes(), Contains(0x21044814U));
 }
 
-TEST_F(RequestTest, CreatingTheSameIdentifierTwiceDropsTheFirstSessionUnstopped) {
+TEST_F(RequestTest, CreatingTheSameIdentifierTwiceDropsTheFirstSessionWithoutAStop) {
   start(*client, 77);
   const std::weak_ptr<TWReportingSession> first = sessionOf(0, 77);
   journal.take();
@@ -76,7 +76,7 @@ TEST_F(RequestTest, CreatingTheSameIdentifierTwiceDropsTheFirstSessionUnstopped)
   EXPECT_THAT(journal.take(), Not(Contains("Metricon stopped")));
 }
 
-TEST_F(RequestTest, IdentifierZeroIsStoredAndReachedOnlyByTeardown) {
+TEST_F(RequestTest, IdentifierZeroIsStoredAndReachedOnlyWhenTheClientEnds) {
   create(*client, 0);
   const std::weak_ptr<TWReportingSession> session = sessionOf(0, 0);
   for (const char* method :
@@ -96,7 +96,7 @@ TEST_F(RequestTest, IdentifierZeroIsStoredAndReachedOnlyByTeardown) {
   EXPECT_TRUE(session.expired());
 }
 
-TEST_F(RequestTest, AConnectionHoldsSoManySessionsAndNotOneMore) {
+TEST_F(RequestTest, AConnectionHoldsSessionsUpToItsLimit) {
   constexpr auto kMax = static_cast<ReporterID>(TWReportingClientServerInstance::kMaxSessions);
   for (ReporterID reporterID = 1; reporterID <= kMax; ++reporterID) {
     client->notify("createReportingSession", {reporterID});
@@ -108,7 +108,7 @@ TEST_F(RequestTest, AConnectionHoldsSoManySessionsAndNotOneMore) {
   EXPECT_EQ(refused[0].error->code, 3);
   EXPECT_THAT(refused[0].error->message, HasSubstr("4096"));
   EXPECT_EQ(sessionOf(0, kMax + 1), nullptr);
-  create(*client, kMax);  // replacing one is not one more
+  create(*client, kMax);  // replaces a session
   askOnce(*client, "destroyReportingSession", {1});
   create(*client, kMax + 1);
 }
@@ -123,7 +123,7 @@ TEST_F(RequestTest, SettingTheSameServiceTypeKeepsTheSession) {
   EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kInfo), Contains("setting service type unknown"));
 }
 
-TEST_F(RequestTest, ChangingTheServiceTypeOfAStartedSessionMakesAnotherNotStartedWithWhatTheFirstWasTold) {
+TEST_F(RequestTest, ChangingTheServiceTypeReplacesAStartedSessionByAnUnstartedOneWithItsValues) {
   test.processes.setName(12, "player");
   const auto player = connect(12);
   start(*player, 77);
@@ -148,7 +148,7 @@ TEST_F(RequestTest, ChangingTheServiceTypeOfAStartedSessionMakesAnotherNotStarte
                               Contains("service type 2 set for reporter  77")));
 }
 
-TEST_F(RequestTest, TheServiceTypeOfAnUnknownSessionIsSetNowhereAndAnsweredAllTheSame) {
+TEST_F(RequestTest, SettingTheServiceTypeOfAnUnknownSessionDoesNothingAndIsAnswered) {
   EXPECT_EQ(askOnce(*client, "setServiceType", {2, 5}), Value(true));
   EXPECT_EQ(askOnce(*client, "setServiceType", {2, 0}), Value(true));
   EXPECT_THAT(logged(), Not(Contains(HasSubstr("set for reporter"))));
@@ -198,7 +198,7 @@ TEST_F(RequestTest, AConfigurationPastTheBudgetIsRefusedAndChangesNothing) {
   EXPECT_EQ(sessionOf(0, 77)->configuration().size(), 255U);
 }
 
-// What is not kept.
+// A full budget.
 
 class FullBudgetTest : public RequestTest {
  protected:
@@ -210,14 +210,14 @@ class FullBudgetTest : public RequestTest {
     EXPECT_EQ(askOnce(*client, "setConfiguration", {configuration, 70}), Value(true));
   }
 
-  // A session that was never started and got a message that is not kept.
+  // Creates a session, does not start it, and sends it a message that does not fit into the budget.
   void createOverBudget(ReporterID reporterID) {
     create(*client, reporterID);
     send({{"text", megabyte}}, Value(ValueArray{reporterID}));
     EXPECT_THAT(sessionOf(0, reporterID)->messages(), IsEmpty());
   }
 
-  std::vector<std::string> counted() {
+  std::vector<std::string> takeUnkeptLines() {
     std::vector<std::string> lines = test.log.textsOf("twrr", LogLevel::kError);
     std::erase_if(lines, [](const std::string& line) { return !line.starts_with("messages delivered"); });
     test.log.clear();
@@ -231,32 +231,32 @@ class FullBudgetTest : public RequestTest {
   const Value megabyte{std::string(1 << 20, 'x')};
 };
 
-TEST_F(FullBudgetTest, ASessionThatWasNeverStartedSaysWhatItDidNotKeepWhenItIsStopped) {
+TEST_F(FullBudgetTest, ANeverStartedSessionLogsUnkeptMessagesWhenItIsStopped) {
   createOverBudget(77);
   ask(*client, "stopReportingSessionForID", {77});
-  EXPECT_THAT(counted(), ElementsAre(unkept(77)));
+  EXPECT_THAT(takeUnkeptLines(), ElementsAre(unkept(77)));
   ask(*client, "stopReportingSessionForID", {77});
-  EXPECT_THAT(counted(), IsEmpty());
+  EXPECT_THAT(takeUnkeptLines(), IsEmpty());
 }
 
-TEST_F(FullBudgetTest, ASessionThatWasNeverStartedSaysWhatItDidNotKeepWhenItGoes) {
+TEST_F(FullBudgetTest, ANeverStartedSessionLogsUnkeptMessagesWhenItEnds) {
   createOverBudget(77);
   create(*client, 77);
-  EXPECT_THAT(counted(), ElementsAre(unkept(77)));
+  EXPECT_THAT(takeUnkeptLines(), ElementsAre(unkept(77)));
   createOverBudget(78);
   ask(*client, "destroyReportingSession", {78});
-  EXPECT_THAT(counted(), ElementsAre(unkept(78)));
+  EXPECT_THAT(takeUnkeptLines(), ElementsAre(unkept(78)));
   createOverBudget(79);
   ask(*client, "setServiceType", {2, 79});
-  EXPECT_THAT(counted(), ElementsAre(unkept(79)));
+  EXPECT_THAT(takeUnkeptLines(), ElementsAre(unkept(79)));
   createOverBudget(80);
   client->disconnect();
   run();
-  EXPECT_THAT(counted(), ElementsAre(unkept(80)));
+  EXPECT_THAT(takeUnkeptLines(), ElementsAre(unkept(80)));
 }
 
-// Of two sessions with one configuration there is never more than one.
-TEST_F(FullBudgetTest, AChangeOfTheServiceTypeAlwaysSucceedsAndKeepsWhatTheFirstWasTold) {
+// The configuration is never counted for the old and the new session at once.
+TEST_F(FullBudgetTest, AChangeOfTheServiceTypeAlwaysSucceedsAndKeepsTheValues) {
   const ValueMap configuration = sessionOf(0, 70)->configuration();
   send({{"volume", 1}}, Value(ValueArray{70}));
   const ValueMap previousValues = sessionOf(0, 70)->previousValues();
@@ -267,10 +267,10 @@ TEST_F(FullBudgetTest, AChangeOfTheServiceTypeAlwaysSucceedsAndKeepsWhatTheFirst
     EXPECT_EQ(sessionOf(0, 70)->previousValues(), previousValues);
   }
   EXPECT_EQ(ask(*client, "setConfiguration", {ValueMap{{"more", megabyte}}, 70}).at(0).error->code, 3);
-  EXPECT_THAT(counted(), IsEmpty());
+  EXPECT_THAT(takeUnkeptLines(), IsEmpty());
 }
 
-TEST_F(FullBudgetTest, AReplacedSessionThatIsStillHeldCountsNoMore) {
+TEST_F(FullBudgetTest, AReplacedSessionThatLivesOnNoLongerCounts) {
   const auto first = sessionOf(0, 70);
   for (const int serviceType : {2, 3, 2}) ask(*client, "setServiceType", {serviceType, 70});
   ask(*client, "destroyReportingSession", {70});
@@ -280,7 +280,7 @@ TEST_F(FullBudgetTest, AReplacedSessionThatIsStillHeldCountsNoMore) {
 
 // Start and stop.
 
-TEST_F(RequestTest, TheStartsAnswerComesWithTheStopBeforeTheStopsOwn) {
+TEST_F(RequestTest, TheStartIsAnsweredAtTheStopBeforeTheStopItself) {
   create(*client, 77);
   const auto started = client->request("startReportingSessionForID", {77});
   run();
@@ -319,7 +319,7 @@ TEST_F(RequestTest, AnUnansweredStartIsNotAnUnfinishedRequest) {
   EXPECT_EQ(client->unfinishedRequests(), 0U);
 }
 
-TEST_F(RequestTest, StartingWhatIsNotThereIsAnsweredAtOnce) {
+TEST_F(RequestTest, StartingAnUnknownSessionIsAnsweredAtOnce) {
   EXPECT_EQ(askOnce(*client, "startReportingSessionForID", {0}), Value(true));
   EXPECT_EQ(askOnce(*client, "startReportingSessionForID", {5}), Value(true));
   const auto other = connect(12);
@@ -341,7 +341,7 @@ TEST_F(RequestTest, AfterAStopASessionMayBeStartedAgain) {
 TEST_F(RequestTest, AStartAnswersAnEarlierStartThatWasStillWaiting) {
   start(*client, 77);
   const auto first = client->responses().size();
-  sessionOf(0, 77)->stop();  // as at the end of a transaction that no request stopped
+  sessionOf(0, 77)->stop();  // a stop without a request
   client->request("startReportingSessionForID", {77});
   run();
   EXPECT_EQ(client->responses().size(), first + 1);
@@ -366,7 +366,7 @@ TEST_F(RequestTest, OnOtherBuildsATestSessionsStartWaitsLikeAnyOther) {
   EXPECT_THAT(ask(*client, "startReportingSessionForID", {77}), IsEmpty());
 }
 
-TEST_F(RequestTest, StoppingWhatIsNotStartedIsAnsweredAndLogged) {
+TEST_F(RequestTest, StoppingAnUnstartedSessionIsAnsweredAndLogged) {
   EXPECT_EQ(askOnce(*client, "stopReportingSessionForID", {5}), Value(true));
   create(*client, 77);
   EXPECT_EQ(askOnce(*client, "stopReportingSessionForID", {77}), Value(true));
@@ -404,7 +404,7 @@ TEST_F(RequestTest, EachRequestsBodyIsAnIntervalForPerformanceTraces) {
 
 // Messages.
 
-TEST_F(RequestTest, AMessageReachesTheSessionsNamedEachWithARecordOfItsOwn) {
+TEST_F(RequestTest, AMessageReachesEachNamedSessionWithARecordOfItsOwn) {
   create(*client, 77);
   create(*client, 78);
   send({{"a", 1}}, Value(ValueArray{77, 78, 5, 0}));
@@ -427,7 +427,7 @@ TEST_F(RequestTest, AMessageReachesSessionsOfOtherClients) {
   EXPECT_THAT(sessionOf(1, 78)->messages(), SizeIs(1));
 }
 
-TEST_F(RequestTest, AMessageNamesAsManySessionsAsAConnectionHoldsAndNotOneMore) {
+TEST_F(RequestTest, AMessageNamesSessionsUpToTheLimitOfAConnection) {
   create(*client, 77);
   const auto named = [](std::size_t count) {
     return Value(ValueArray(std::vector<Value>(count, Value(77))));
@@ -467,7 +467,7 @@ TEST_F(RequestTest, OnInternalBuildsAMessageWithoutIdentifiersIsMarked) {
   EXPECT_FALSE(sessionOf(0, 77)->messages().back()->message.contains("sendSingleMessage"));
 }
 
-TEST_F(RequestTest, OnOtherBuildsItIsNot) {
+TEST_F(RequestTest, OnOtherBuildsAMessageWithoutIdentifiersIsNotMarked) {
   start(*client, 77);
   send({{"a", 1}}, Value(ValueArray{}));
   EXPECT_FALSE(sessionOf(0, 77)->messages().back()->message.contains("sendSingleMessage"));
@@ -479,7 +479,7 @@ TEST_F(RequestTest, WhileReportingIsDisabledNothingIsMarked) {
   EXPECT_TRUE(ask(*client, "sendMessage", {ValueMap{{"a", 1}}, 4, 1, std::nullopt}).at(0).error);
 }
 
-TEST_F(RequestTest, WithNothingStartedAMessageWithoutIdentifiersGoesToTheSingleMessageSession) {
+TEST_F(RequestTest, WithoutAStartedSessionAMessageWithoutIdentifiersGoesToTheSingleMessageSession) {
   send({{"a", 1}}, std::nullopt);
   EXPECT_THAT(delivered(), ElementsAre("a=1"));
   EXPECT_THAT(logged(), Contains("sending message for reporter (null)"));
@@ -546,7 +546,7 @@ TEST_F(RequestTest, KillEndsTheProcessAtOnceWithoutAnAnswerOrAStop) {
   start(*client, 77);
   journal.take();
   const auto killed = client->request("killService", {});
-  EXPECT_EQ(processEnds, 1);  // without the work queue
+  EXPECT_EQ(processEnds, 1);  // before the work queue runs
   run();
   EXPECT_EQ(client->responseTo(killed), std::nullopt);
   EXPECT_TRUE(sessionOf(0, 77)->started());

@@ -25,7 +25,7 @@ const std::optional<std::vector<ReporterID>> kNoIDs;
 
 class TWReportingServiceTest : public ServiceTest {
  protected:
-  std::vector<ReporterID> foundFor(const std::optional<std::vector<ReporterID>>& identifiers) {
+  std::vector<ReporterID> identifiersFoundFor(const std::optional<std::vector<ReporterID>>& identifiers) {
     std::vector<ReporterID> found;
     for (const auto& session : service->findReportingSessionsForIDs(identifiers))
       found.push_back(session->reporterID());
@@ -33,7 +33,7 @@ class TWReportingServiceTest : public ServiceTest {
   }
 };
 
-// Clients come and go.
+// Clients.
 
 TEST_F(TWReportingServiceTest, ListsClientsInOrderOfConnectionWithTheirNamesAndStartDates) {
   test.processes.setName(11, "player");
@@ -50,7 +50,7 @@ TEST_F(TWReportingServiceTest, ListsClientsInOrderOfConnectionWithTheirNamesAndS
   EXPECT_THAT(test.log.textsOf("twrs", LogLevel::kInfo), Contains("new client with pid 11"));
 }
 
-TEST_F(TWReportingServiceTest, AClientThatLeavesIsRemovedOnceAlthoughTwoHandlersSaySo) {
+TEST_F(TWReportingServiceTest, AClientThatLeavesIsRemovedOnceAlthoughTwoHandlersRun) {
   auto client = connect(11);
   run();
   client->disconnect();
@@ -101,7 +101,7 @@ TEST_F(TWReportingServiceTest, ReportsHowLongAClientWasConnected) {
 
 TEST_F(TWReportingServiceTest, AClientThatWasNeverRegisteredHasNoStartDateAndMinusOneSeconds) {
   auto client = connect(11);
-  client->disconnect();  // before the work queue has got to it
+  client->disconnect();  // before the work queue registers it
   EXPECT_THAT(test.log.textsOf("twrs", LogLevel::kInfo),
               AllOf(Contains("clientStartDate is nil. clientpid=11 clientprocessname=unknown"),
                     Contains("clientProcessName is nil. clientpid=11"),
@@ -112,7 +112,7 @@ TEST_F(TWReportingServiceTest, AClientThatWasNeverRegisteredHasNoStartDateAndMin
   EXPECT_THAT(service->getAllClients(), IsEmpty());
 }
 
-TEST_F(TWReportingServiceTest, AStartDateInTheFutureIsLoggedAndTheIntervalCounts) {
+TEST_F(TWReportingServiceTest, AStartDateInTheFutureIsLoggedAndTheDifferenceIsReported) {
   test.processes.setName(11, "player");
   auto client = connect(11);
   run();
@@ -124,8 +124,8 @@ TEST_F(TWReportingServiceTest, AStartDateInTheFutureIsLoggedAndTheIntervalCounts
             100.0);
 }
 
-// A tool that asks for the list of sessions left an event of its own behind, each time.
-TEST_F(TWReportingServiceTest, ReportsNothingOfAnOnlookerAndLogsItsGoingForDebuggingAlone) {
+// Each use of a tool that lists the sessions once caused an event of its own.
+TEST_F(TWReportingServiceTest, ReportsNothingForAnOnlookerAndLogsItsEndForDebuggingOnly) {
   test.processes.setName(11, "twctl");
   auto client = connect(11);
   EXPECT_EQ(askOnce(*client, "observe", {}), Value(true));
@@ -144,7 +144,7 @@ TEST_F(TWReportingServiceTest, ReportsNothingOfAnOnlookerAndLogsItsGoingForDebug
                   "removing 11 from the server client list", "dealloc 11 from the server client list"));
 }
 
-TEST_F(TWReportingServiceTest, AnOnlookerMayAskAndChangeNothing) {
+TEST_F(TWReportingServiceTest, AnOnlookerMayAskButChangeNothing) {
   const auto client = connect(11);
   start(*client, 77);
   const auto onlooker = connect(12);
@@ -168,13 +168,13 @@ TEST_F(TWReportingServiceTest, AnOnlookerMayAskAndChangeNothing) {
                                     " changes something"));
   }
   EXPECT_EQ(processEnds, 0);
-  EXPECT_THAT(sessionOf(0, 77)->messages(), SizeIs(1));  // of its start
+  EXPECT_THAT(sessionOf(0, 77)->messages(), SizeIs(1));  // the start message
   EXPECT_EQ(askOnce(*onlooker, "getAllReporters", {}), Value(ValueArray{77}));
   EXPECT_EQ(askOnce(*onlooker, "reporterIDValid", {77}).asMap()->integer("reporterID"), 77);
   EXPECT_EQ(askOnce(*onlooker, "watch.sessions", {0}).asMap()->integer("total"), 1);
 }
 
-TEST_F(TWReportingServiceTest, WhoHasChangedSomethingIsAClientForGood) {
+TEST_F(TWReportingServiceTest, AConnectionThatChangedSomethingStaysAClient) {
   test.processes.setName(11, "player");
   auto client = connect(11);
   EXPECT_EQ(askOnce(*client, "getAllReporters", {}), Value(ValueArray()));
@@ -187,7 +187,7 @@ TEST_F(TWReportingServiceTest, WhoHasChangedSomethingIsAClientForGood) {
   EXPECT_THAT(test.metricon.eventsNamed("com.orvane.tonewerk.twreportingclientuptime"), SizeIs(1));
 }
 
-TEST_F(TWReportingServiceTest, SaysWhenItGoes) {
+TEST_F(TWReportingServiceTest, LogsItsEnd) {
   service.reset();
   EXPECT_THAT(test.log.textsOf("twrc", LogLevel::kInfo), ElementsAre("destroying service"));
 }
@@ -203,7 +203,7 @@ TEST_F(TWReportingServiceTest, FindsASessionOfAnyClient) {
               Contains("found reporting session 78 for client 12"));
 }
 
-TEST_F(TWReportingServiceTest, OfTwoClientsWithOneIdentifierTheFirstConnectedWins) {
+TEST_F(TWReportingServiceTest, AnIdentifierOfTwoClientsFindsTheSessionOfTheFirstConnected) {
   const auto first = connect(11);
   const auto second = connect(12);
   create(*second, 77);
@@ -216,7 +216,7 @@ TEST_F(TWReportingServiceTest, AnUnknownIdentifierIsAnError) {
   EXPECT_THAT(test.log.textsOf("twrs", LogLevel::kError), ElementsAre("failed to find reporting session 5"));
 }
 
-TEST_F(TWReportingServiceTest, IdentifierZeroAndDisabledReportingFindNothingAndSayNothing) {
+TEST_F(TWReportingServiceTest, IdentifierZeroAndDisabledReportingFindNothingAndLogNothing) {
   const auto client = connect(11);
   create(*client, 0);
   create(*client, 77);
@@ -233,12 +233,12 @@ TEST_F(TWReportingServiceTest, AMessageWithIdentifiersGoesToTheKnownOnesInOrder)
   const auto client = connect(11);
   create(*client, 77);
   create(*client, 78);
-  EXPECT_THAT(foundFor({{78, 0, 5, 77}}), ElementsAre(78, 77));
+  EXPECT_THAT(identifiersFoundFor({{78, 0, 5, 77}}), ElementsAre(78, 77));
 }
 
-TEST_F(TWReportingServiceTest, AMessageToZeroGoesNowhereNotEvenToTheSingleMessageSession) {
-  EXPECT_THAT(foundFor({{0}}), IsEmpty());
-  EXPECT_THAT(foundFor({{5}}), IsEmpty());
+TEST_F(TWReportingServiceTest, AMessageToIdentifierZeroGoesToNoSessionAtAll) {
+  EXPECT_THAT(identifiersFoundFor({{0}}), IsEmpty());
+  EXPECT_THAT(identifiersFoundFor({{5}}), IsEmpty());
   EXPECT_THAT(test.log.textsOf("twrs"), Not(Contains("Creating singleMessageSession")));
 }
 
@@ -249,8 +249,8 @@ TEST_F(TWReportingServiceTest, AMessageWithoutIdentifiersGoesToEveryStartedSessi
   start(*first, 77);
   create(*first, 79);
   start(*second, 5);
-  EXPECT_THAT(foundFor(kNoIDs), ElementsAre(77, 78, 5));
-  EXPECT_THAT(foundFor({{}}), ElementsAre(77, 78, 5));
+  EXPECT_THAT(identifiersFoundFor(kNoIDs), ElementsAre(77, 78, 5));
+  EXPECT_THAT(identifiersFoundFor({{}}), ElementsAre(77, 78, 5));
   EXPECT_THAT(test.log.textsOf("twrs"), Not(Contains("Creating singleMessageSession")));
 }
 
@@ -258,7 +258,7 @@ TEST_F(TWReportingServiceTest, ListsTheActiveSessionsInTheLog) {
   const auto client = connect(11);
   start(*client, 77);
   test.log.clear();
-  foundFor(kNoIDs);
+  identifiersFoundFor(kNoIDs);
   const auto lines = test.log.textsOf("twrs", LogLevel::kDebug);
   EXPECT_THAT(
       lines, Contains(StartsWith("sessions for client 11 : (reporterID=77,serviceName=unknown,ownerPid=11")));
@@ -283,7 +283,7 @@ TEST_F(TWReportingServiceTest, WithNoStartedSessionAMessageWithoutIdentifiersMak
   EXPECT_THAT(service->getAllActiveReportingSessions(), IsEmpty());  // it belongs to no client
 }
 
-TEST_F(TWReportingServiceTest, AClientsOwnIdentifierOneIsAnotherSession) {
+TEST_F(TWReportingServiceTest, AClientsSessionOneIsNotTheSingleMessageSession) {
   const auto client = connect(11);
   create(*client, 1);
   const auto single = service->findReportingSessionsForIDs(kNoIDs).at(0);
@@ -291,10 +291,10 @@ TEST_F(TWReportingServiceTest, AClientsOwnIdentifierOneIsAnotherSession) {
   EXPECT_EQ(service->findReportingSessionForID(1), sessionOf(0, 1));
 }
 
-TEST_F(TWReportingServiceTest, AStartedSessionOfAnyClientMakesTheSingleMessageSessionUnneeded) {
+TEST_F(TWReportingServiceTest, WithAStartedSessionOfAnyClientNoSingleMessageSessionIsMade) {
   const auto client = connect(11);
   start(*client, 77);
-  EXPECT_THAT(foundFor(kNoIDs), ElementsAre(77));
+  EXPECT_THAT(identifiersFoundFor(kNoIDs), ElementsAre(77));
   EXPECT_THAT(test.log.textsOf("twrs"), Not(Contains("Creating singleMessageSession")));
 }
 
@@ -313,14 +313,14 @@ TEST_F(TWReportingServiceTest, MessagesKeepTheSingleMessageSessionAliveUntilFive
   EXPECT_NE(service->findReportingSessionsForIDs(kNoIDs).at(0), first);
 }
 
-TEST_F(TWReportingServiceTest, TheReaperSaysWhyItWaits) {
-  foundFor(kNoIDs);
+TEST_F(TWReportingServiceTest, TheReaperLogsWhyItWaits) {
+  identifiersFoundFor(kNoIDs);
   test.clock.advance(0.5);
   EXPECT_THAT(test.log.textsOf("twrs", LogLevel::kDebug),
               Contains("Not stopping singleMessageSession. elapsed=0.500000 timeout=5.000000"));
 }
 
-TEST_F(TWReportingServiceTest, TheReaperHasTheWorkQueueStopTheSession) {
+TEST_F(TWReportingServiceTest, TheReaperQueuesTheStopOfTheSession) {
   const auto single = service->findReportingSessionsForIDs(kNoIDs).at(0);
   test.clock.advance(6.0);
   EXPECT_TRUE(single->started());  // taken out, not yet stopped
@@ -328,8 +328,8 @@ TEST_F(TWReportingServiceTest, TheReaperHasTheWorkQueueStopTheSession) {
   EXPECT_FALSE(single->started());
 }
 
-TEST_F(TWReportingServiceTest, TheReapersTimerEndsWithTheSessionAndANewOneComesWithTheNext) {
-  foundFor(kNoIDs);
+TEST_F(TWReportingServiceTest, TheReapersTimerEndsWithTheSessionAndTheNextSessionHasANewOne) {
+  identifiersFoundFor(kNoIDs);
   test.clock.advance(6.0);
   run();
   test.log.clear();
@@ -348,7 +348,7 @@ TEST_F(TWReportingServiceTest, ATickWithoutASessionDoesNothing) {
   EXPECT_THAT(test.log.textsOf("twrs"), IsEmpty());
 }
 
-TEST_F(TWReportingServiceTest, FollowsTheSystemsFeaturesOnTheWorkQueueFromItsMakingOn) {
+TEST_F(TWReportingServiceTest, MonitorsTheSystemOnTheWorkQueueAsSoonAsItIsMade) {
   const auto map = TWReportingSystemMonitor::getSystemMonitorDictionary();
   ASSERT_NE(map, nullptr);
   EXPECT_FALSE(test.notifications.post("com.orvane.homedeck.ringerstate", 1));
@@ -363,7 +363,7 @@ TEST_F(TWReportingServiceTest, AtItsEndTheDaemonStopsTheSingleMessageSession) {
   service->stopSingleMessageSession();
   EXPECT_FALSE(single->started());
   service->stopSingleMessageSession();
-  EXPECT_THAT(foundFor(kNoIDs), ElementsAre(1));
+  EXPECT_THAT(identifiersFoundFor(kNoIDs), ElementsAre(1));
 }
 
 }  // namespace

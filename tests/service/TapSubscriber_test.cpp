@@ -15,7 +15,7 @@ using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 using ::testing::SizeIs;
 
-// What a watcher answered, in order.
+// Collects the answers, in order.
 class Answers final : public ReplySink {
  public:
   void reply(std::uint32_t /*requestIdentifier*/, const std::optional<ReplyError>& error,
@@ -27,8 +27,8 @@ class Answers final : public ReplySink {
   std::vector<ValueMap> all;
 };
 
-// Counts requests that are finished.
-class Gauge final : public InFlightCounter {
+// Counts the finished requests.
+class FinishedCounter final : public InFlightCounter {
  public:
   void finished(std::size_t /*bytes*/) override { ++count; }
   int count = 0;
@@ -47,8 +47,8 @@ class TapSubscriberTest : public ReportingTest {
   void offerNumbers(int first, int last) {
     for (int number = first; number <= last; ++number) offer({{"number", number}});
   }
-  void ask() { watcher->next(Reply(answers, 1), InFlightToken(gauge, 0)); }
-  // Asks, and takes the answer out; empty when there is none yet.
+  void ask() { watcher->next(Reply(answers, 1), InFlightToken(finishedRequests, 0)); }
+  // Sends a request and returns its answer; empty when the request is held back.
   ValueMap next() {
     answers->all.clear();
     ask();
@@ -62,7 +62,7 @@ class TapSubscriberTest : public ReportingTest {
     }
     return numbers;
   }
-  // Of `levels` maps inside each other.
+  // Returns `levels` maps, each inside the one before.
   static ValueMap nested(std::size_t levels) {
     ValueMap map{{"number", 1}};
     for (std::size_t level = 1; level < levels; ++level) map = ValueMap{{"inner", map}};
@@ -72,10 +72,10 @@ class TapSubscriberTest : public ReportingTest {
   std::shared_ptr<TWReportingSession> session = makeSession(77);
   std::shared_ptr<TapSubscriber> watcher = std::make_shared<TapSubscriber>();
   std::shared_ptr<Answers> answers = std::make_shared<Answers>();
-  std::shared_ptr<Gauge> gauge = std::make_shared<Gauge>();
+  std::shared_ptr<FinishedCounter> finishedRequests = std::make_shared<FinishedCounter>();
 };
 
-TEST_F(TapSubscriberTest, SaysWhatArrivedWhereAndWhen) {
+TEST_F(TapSubscriberTest, DescribesEachMessage) {
   TWReportingSessionMessage record(
       {{"twreporting_timestamp", 1763634000.5}, {"HostApplicationDisplayID", "com.example.player"}}, 4, 1);
   record.isRedundant = true;
@@ -102,22 +102,22 @@ TEST_F(TapSubscriberTest, CopiesNoPayload) {
   EXPECT_TRUE(message.find("payload")->asMap()->sharesStorageWith(payload));
 }
 
-TEST_F(TapSubscriberTest, HoldsARequestBackUntilThereIsSomething) {
+TEST_F(TapSubscriberTest, HoldsARequestBackUntilThereIsAMessage) {
   ask();
   test.queues.runAll();
   EXPECT_THAT(answers->all, IsEmpty());
-  EXPECT_EQ(gauge->count, 0);
+  EXPECT_EQ(finishedRequests->count, 0);
   offerNumbers(1, 1);
   test.queues.runAll();
   ASSERT_THAT(answers->all, SizeIs(1));
   EXPECT_THAT(numbersIn(answers->all[0]), ElementsAre(1));
-  EXPECT_EQ(gauge->count, 1);
+  EXPECT_EQ(finishedRequests->count, 1);
   offerNumbers(2, 2);
   test.queues.runAll();
   EXPECT_THAT(answers->all, SizeIs(1)) << "answered twice";
 }
 
-TEST_F(TapSubscriberTest, AnswersAHeldRequestOnceForAllThatIsQueuedByThen) {
+TEST_F(TapSubscriberTest, AnswersAHeldRequestOnceForAllMessagesUntilThen) {
   ask();
   offerNumbers(1, 3);
   EXPECT_THAT(answers->all, IsEmpty());
@@ -131,7 +131,7 @@ TEST_F(TapSubscriberTest, AnswersTheHeldRequestWithNothingWhenAnotherComes) {
   ask();
   ASSERT_THAT(answers->all, SizeIs(1));
   EXPECT_EQ(answers->all[0].text(), R"({"missed":0,"messages":[]})");
-  EXPECT_EQ(gauge->count, 1);
+  EXPECT_EQ(finishedRequests->count, 1);
   offerNumbers(1, 1);
   test.queues.runAll();
   ASSERT_THAT(answers->all, SizeIs(2));
@@ -141,7 +141,7 @@ TEST_F(TapSubscriberTest, AnswersTheHeldRequestWithNothingWhenAnotherComes) {
 TEST_F(TapSubscriberTest, DoesNotAnswerTheLaterRequestWithNothingWhenTheEarlierTookAll) {
   ask();
   offerNumbers(1, 1);
-  ask();  // the first is answered now, with what has arrived
+  ask();  // answers the first request with the message
   test.queues.runAll();
   ASSERT_THAT(answers->all, SizeIs(1));
   EXPECT_THAT(numbersIn(answers->all[0]), ElementsAre(1));
@@ -151,7 +151,7 @@ TEST_F(TapSubscriberTest, DoesNotAnswerTheLaterRequestWithNothingWhenTheEarlierT
   EXPECT_THAT(numbersIn(answers->all[1]), ElementsAre(2));
 }
 
-TEST_F(TapSubscriberTest, ShowsOnlyWhatIsWanted) {
+TEST_F(TapSubscriberTest, ShowsOnlyMessagesThatMatchTheFilter) {
   watcher->open({{77}, {4, 5}, {1}});
   offer({{"number", 1}}, 4, 1);
   offer({{"number", 2}}, 6, 1);
@@ -163,7 +163,7 @@ TEST_F(TapSubscriberTest, ShowsOnlyWhatIsWanted) {
   EXPECT_EQ(next(), ValueMap());
 }
 
-TEST_F(TapSubscriberTest, HoldsSoManyMessagesAndMissesTheOldest) {
+TEST_F(TapSubscriberTest, MissesTheOldestMessagesOverTheLimitOfMessages) {
   const int most = static_cast<int>(TapSubscriber::kMaxMessages);
   offerNumbers(1, most);
   EXPECT_EQ(watcher->waitingMessages(), TapSubscriber::kMaxMessages);
@@ -175,7 +175,7 @@ TEST_F(TapSubscriberTest, HoldsSoManyMessagesAndMissesTheOldest) {
   EXPECT_EQ(next().integer("missed"), 0) << "told twice";
 }
 
-TEST_F(TapSubscriberTest, HoldsSoManyBytesAndMissesTheOldest) {
+TEST_F(TapSubscriberTest, MissesTheOldestMessagesOverTheLimitOfBytes) {
   const std::string text(100'000, 'x');
   for (int number = 1; number <= 50; ++number) offer({{"number", number}, {"text", text}});
   EXPECT_LE(watcher->waitingBytes(), TapSubscriber::kMaxBytes);
@@ -193,7 +193,7 @@ TEST_F(TapSubscriberTest, HoldsSoManyBytesAndMissesTheOldest) {
   EXPECT_EQ(numbers.back(), 50);
 }
 
-TEST_F(TapSubscriberTest, AnAnswerComesToNoMoreThanItsBound) {
+TEST_F(TapSubscriberTest, AnAnswerStaysWithinItsLimit) {
   const std::string text(200'000, 'x');
   for (int number = 1; number <= 5; ++number) offer({{"number", number}, {"text", text}});
   EXPECT_THAT(numbersIn(next()), ElementsAre(1, 2));
@@ -201,7 +201,7 @@ TEST_F(TapSubscriberTest, AnAnswerComesToNoMoreThanItsBound) {
   EXPECT_THAT(numbersIn(next()), ElementsAre(5));
 }
 
-TEST_F(TapSubscriberTest, MissesAMessageThatNoAnswerHolds) {
+TEST_F(TapSubscriberTest, MissesAMessageLargerThanAnAnswer) {
   ValueMap payload{{"number", 1}, {"text", ""}};
   const std::size_t room = TapSubscriber::kMaxAnswerBytes - TapSubscriber::kRecordBytes - payload.bytes();
   payload.set("text", std::string(room, 'x'));
@@ -221,7 +221,7 @@ TEST_F(TapSubscriberTest, MissesAPayloadThatIsNestedTooDeepForAnAnswer) {
   EXPECT_THAT(*answer.find("messages")->asArray(), SizeIs(1));
 }
 
-TEST_F(TapSubscriberTest, AnswersAHeldRequestAlsoWhenSomethingWasOnlyMissed) {
+TEST_F(TapSubscriberTest, AnswersAHeldRequestWhenAMessageWasOnlyMissed) {
   ask();
   offer({{"text", std::string(TapSubscriber::kMaxAnswerBytes, 'x')}});
   test.queues.runAll();
@@ -229,7 +229,7 @@ TEST_F(TapSubscriberTest, AnswersAHeldRequestAlsoWhenSomethingWasOnlyMissed) {
   EXPECT_EQ(answers->all[0].text(), R"({"missed":1,"messages":[]})");
 }
 
-TEST_F(TapSubscriberTest, BeginsAnewWhenItIsOpenedAgain) {
+TEST_F(TapSubscriberTest, StartsOverWhenItIsOpenedAgain) {
   offerNumbers(1, static_cast<int>(TapSubscriber::kMaxMessages) + 1);
   watcher->open({});
   EXPECT_EQ(watcher->waitingMessages(), 0U);
@@ -238,13 +238,13 @@ TEST_F(TapSubscriberTest, BeginsAnewWhenItIsOpenedAgain) {
   EXPECT_EQ(next().integer("missed"), 0);
 }
 
-TEST_F(TapSubscriberTest, GoesWhileAnAnswerIsQueued) {
+TEST_F(TapSubscriberTest, MayEndWhileAnAnswerIsQueued) {
   ask();
   offerNumbers(1, 1);
   watcher = nullptr;
   test.queues.runAll();
   EXPECT_THAT(answers->all, IsEmpty());
-  EXPECT_EQ(gauge->count, 1);
+  EXPECT_EQ(finishedRequests->count, 1);
 }
 
 TEST_F(TapSubscriberTest, CutsALongApplicationName) {

@@ -33,7 +33,7 @@ class WatchRequestsTest : public ServiceTest {
   void open(MemoryClient& client, const Arguments& filter = kNoFilter) {
     EXPECT_EQ(askOnce(client, "watch.openMessages", filter), Value(true));
   }
-  // The messages in the answer to a request that has one at once.
+  // Sends a request that is answered at once; returns the messages in the answer.
   std::vector<ValueMap> nextMessages(MemoryClient& client) {
     std::vector<ValueMap> messages;
     const Value answer = askOnce(client, "watch.nextMessages", {});
@@ -47,7 +47,7 @@ class WatchRequestsTest : public ServiceTest {
     for (const ValueMap& message : messages) identifiers.push_back(message.integer("reporterID"));
     return identifiers;
   }
-  std::vector<ValueMap> listed(MemoryClient& client, std::int64_t first = 0) {
+  std::vector<ValueMap> listSessions(MemoryClient& client, std::int64_t first = 0) {
     std::vector<ValueMap> sessions;
     const Value answer = askOnce(client, "watch.sessions", {first});
     total = answer.asMap()->integer("total");
@@ -64,7 +64,7 @@ class WatchRequestsTest : public ServiceTest {
   std::int64_t total = 0;
 };
 
-// Who may ask.
+// Permissions.
 
 TEST_F(WatchRequestsTest, IsForTheDaemonsOwnUserAndRoot) {
   const std::vector<std::pair<std::string, Arguments>> requests{
@@ -79,12 +79,12 @@ TEST_F(WatchRequestsTest, IsForTheDaemonsOwnUserAndRoot) {
   }
   const auto root = messaging.connect(13, 0);
   open(*root);
-  listed(*root);
+  listSessions(*root);
 }
 
 // Sessions.
 
-TEST_F(WatchRequestsTest, SaysWhatEachSessionIsAndDoes) {
+TEST_F(WatchRequestsTest, DescribesEachSession) {
   test.processes.setName(11, "player");
   const auto client = connect(11);
   create(*client, 77);
@@ -107,20 +107,20 @@ TEST_F(WatchRequestsTest, SaysWhatEachSessionIsAndDoes) {
 TEST_F(WatchRequestsTest, ASessionThatIsNotStartedHasNoRunningTime) {
   const auto client = connect(11);
   create(*client, 77);
-  const auto sessions = listed(*client);
+  const auto sessions = listSessions(*client);
   ASSERT_THAT(sessions, SizeIs(1));
   EXPECT_FALSE(sessions[0].contains("seconds"));
   EXPECT_FALSE(sessions[0].boolean("started"));
   EXPECT_FALSE(sessions[0].contains("processName"));
 }
 
-TEST_F(WatchRequestsTest, CountsAnewAfterAStop) {
+TEST_F(WatchRequestsTest, CountsFromZeroAfterAStop) {
   const auto client = connect(11);
   start(*client, 77);
   send(*client, {{"a", 1}}, {77});
   send(*client, {{"a", 1}}, {77});
   ask(*client, "stopReportingSessionForID", {77});
-  const auto stopped = listed(*client);
+  const auto stopped = listSessions(*client);
   ASSERT_THAT(stopped, SizeIs(1));
   EXPECT_EQ(stopped[0].integer("messages"), 0);
   EXPECT_EQ(stopped[0].integer("redundant"), 0);
@@ -134,7 +134,7 @@ TEST_F(WatchRequestsTest, ListsAllClientsSessionsAndTheSingleMessageSessionLast)
   create(*first, 9);
   create(*first, 8);
   send(*second, {{"a", 1}}, {});
-  const auto sessions = listed(*first);
+  const auto sessions = listSessions(*first);
   EXPECT_THAT(sessionsOf(sessions), ElementsAre(8, 9, 5, 1));
   EXPECT_EQ(total, 4);
   EXPECT_TRUE(sessions.back().boolean("singleMessageSession"));
@@ -148,15 +148,15 @@ TEST_F(WatchRequestsTest, ListsManySessionsInPortions) {
   for (ReporterID reporterID = 1; reporterID <= most; ++reporterID) create(*first, reporterID);
   create(*second, 1001);
   create(*second, 1002);
-  const auto portion = listed(*first);
+  const auto portion = listSessions(*first);
   EXPECT_THAT(portion, SizeIs(kMaxListedSessions));
   EXPECT_EQ(total, most + 2);
-  EXPECT_THAT(sessionsOf(listed(*first, most - 1)), ElementsAre(most, 1001, 1002));
-  EXPECT_THAT(sessionsOf(listed(*first, most)), ElementsAre(1001, 1002));
-  EXPECT_THAT(sessionsOf(listed(*first, most + 1)), ElementsAre(1002));
-  EXPECT_THAT(listed(*first, most + 2), IsEmpty());
+  EXPECT_THAT(sessionsOf(listSessions(*first, most - 1)), ElementsAre(most, 1001, 1002));
+  EXPECT_THAT(sessionsOf(listSessions(*first, most)), ElementsAre(1001, 1002));
+  EXPECT_THAT(sessionsOf(listSessions(*first, most + 1)), ElementsAre(1002));
+  EXPECT_THAT(listSessions(*first, most + 2), IsEmpty());
   EXPECT_EQ(total, most + 2);
-  EXPECT_THAT(listed(*first, -1), SizeIs(kMaxListedSessions));
+  EXPECT_THAT(listSessions(*first, -1), SizeIs(kMaxListedSessions));
 }
 
 TEST_F(WatchRequestsTest, APortionOfTheLongestNamesFitsIntoItsBound) {
@@ -168,7 +168,7 @@ TEST_F(WatchRequestsTest, APortionOfTheLongestNamesFitsIntoItsBound) {
     create(*longNamed, reporterID);
     ask(*longNamed, "setConfiguration", {configuration, reporterID});
   }
-  const auto sessions = listed(*client);
+  const auto sessions = listSessions(*client);
   ASSERT_THAT(sessions, SizeIs(10));
   EXPECT_EQ(sessions[0].text("application").size(), 256U);
   EXPECT_EQ(sessions[0].text("processName").size(), 256U);
@@ -250,7 +250,7 @@ TEST_F(WatchRequestsTest, AHeldRequestIsAnsweredByTheNextMessage) {
   EXPECT_EQ(watcher->unfinishedRequests(), 0U);
 }
 
-TEST_F(WatchRequestsTest, AWatcherGoesWithItsConnection) {
+TEST_F(WatchRequestsTest, AWatcherEndsWithItsConnection) {
   const auto client = connect(11);
   start(*client, 77);
   const auto watcher = connect(12);
@@ -262,7 +262,7 @@ TEST_F(WatchRequestsTest, AWatcherGoesWithItsConnection) {
   run();
   EXPECT_EQ(gone->unfinishedRequests(), 0U) << "something still holds its request";
   send(*client, {{"a", 1}}, {77});
-  EXPECT_THAT(gone->responses(), SizeIs(1));  // that of opening
+  EXPECT_THAT(gone->responses(), SizeIs(1));  // the answer to watch.openMessages
   EXPECT_THAT(nextMessages(*watcher), SizeIs(1));
 }
 
@@ -275,13 +275,13 @@ TEST_F(WatchRequestsTest, OpeningAgainShowsEachMessageOnce) {
   EXPECT_THAT(nextMessages(*client), SizeIs(1));
 }
 
-TEST_F(WatchRequestsTest, WantsToBeOpenedFirst) {
+TEST_F(WatchRequestsTest, MustBeOpenedFirst) {
   const auto client = connect(11);
   EXPECT_EQ(refusalOf(*client, "watch.nextMessages", {}),
             messagingError(2, "watch.nextMessages: watch.openMessages comes first"));
 }
 
-TEST_F(WatchRequestsTest, AFilterHasSoManyEntriesAndNoMore) {
+TEST_F(WatchRequestsTest, AFilterHasEntriesUpToTheLimit) {
   const auto client = connect(11);
   std::vector<Value> numbers(MessageFilter::kMaxEntries - 1, Value(5));
   open(*client, {ValueArray(numbers), ValueArray{4}, std::nullopt});
@@ -289,10 +289,10 @@ TEST_F(WatchRequestsTest, AFilterHasSoManyEntriesAndNoMore) {
             messagingError(3, "the filter has 4097 entries, the most is 4096"));
 }
 
-TEST_F(WatchRequestsTest, NumbersThatAreNoCategoryFitNothing) {
+TEST_F(WatchRequestsTest, NumbersThatAreNotACategoryMatchNothing) {
   const auto client = connect(11);
   start(*client, 77);
-  // The low 32 bits are category 4's.
+  // The low 32 bits are those of category 4.
   open(*client, {std::nullopt, ValueArray{(std::int64_t{1} << 32) + 4}, std::nullopt});
   send(*client, {{"a", 1}}, {77});
   EXPECT_THAT(ask(*client, "watch.nextMessages", {}), IsEmpty());

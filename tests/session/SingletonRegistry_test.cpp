@@ -24,21 +24,21 @@ struct Second {
   int value;
 };
 
-TEST(SingletonRegistryTest, MakesEachOnceAndGivesTheSameAgain) {
+TEST(SingletonRegistryTest, MakesEachObjectOnce) {
   SingletonRegistry singles;
   First& first = singles.get<First>(1);
   EXPECT_EQ(&singles.get<First>(2), &first);
   EXPECT_EQ(first.value, 1);
 }
 
-TEST(SingletonRegistryTest, FindsNothingBeforeItWasAskedFor) {
+TEST(SingletonRegistryTest, FindsNothingBeforeTheFirstGet) {
   SingletonRegistry singles;
   EXPECT_EQ(singles.find<First>(), nullptr);
   First& first = singles.get<First>(1);
   EXPECT_EQ(singles.find<First>(), &first);
 }
 
-TEST(SingletonRegistryTest, OneMayNeedAnotherAndEndsBeforeIt) {
+TEST(SingletonRegistryTest, AnObjectMayUseAnotherAndEndsBeforeIt) {
   ends.clear();
   {
     SingletonRegistry singles;
@@ -47,7 +47,7 @@ TEST(SingletonRegistryTest, OneMayNeedAnotherAndEndsBeforeIt) {
   EXPECT_THAT(ends, ElementsAre("second", "first"));
 }
 
-TEST(SingletonRegistryTest, ThreadsThatAskTogetherGetTheSame) {
+TEST(SingletonRegistryTest, ThreadsThatGetAtOnceShareOneObject) {
   SingletonRegistry singles;
   First* seen[2] = {};
   std::thread one([&] { seen[0] = &singles.get<First>(1); });

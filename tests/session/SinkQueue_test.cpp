@@ -21,7 +21,7 @@ class SinkQueueTest : public ::testing::Test {
     sink = std::make_unique<SinkQueue>(std::move(owned));
   }
 
-  // Submits on a thread of its own; the piece says that it has been taken.
+  // Submits on a new thread, which sets `taken` when submit() has returned.
   std::thread submitElsewhere(std::size_t bytes, std::atomic<bool>& taken) {
     return std::thread([this, bytes, &taken] {
       sink->submit(bytes, [] {});
@@ -52,17 +52,17 @@ TEST_F(SinkQueueTest, MakesTheSubmitterWaitPastItsBound) {
   std::atomic<bool> taken = false;
   std::thread submitter = submitElsewhere(1, taken);
   EXPECT_EQ(queue->pendingCount(), 1U);
-  while (!taken) queue->runAll();  // room comes with the first piece's end
+  while (!taken) queue->runAll();  // the end of the first piece makes room
   submitter.join();
   queue->runAll();
 }
 
-TEST_F(SinkQueueTest, TakesAPieceLargerThanItsBoundWhenNothingWaits) {
+TEST_F(SinkQueueTest, TakesAPieceLargerThanItsBoundWhenItIsEmpty) {
   sink->submit(kMax + 1, [] {});
   EXPECT_EQ(queue->pendingCount(), 1U);
 }
 
-TEST_F(SinkQueueTest, RunsWhatWaitsAtItsEnd) {
+TEST_F(SinkQueueTest, TheDestructorRunsQueuedWork) {
   bool ran = false;
   sink->submit(1, [&] { ran = true; });
   sink.reset();

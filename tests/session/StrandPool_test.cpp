@@ -17,8 +17,8 @@ class StrandPoolTest : public ::testing::Test {
   StrandPoolTest() {
     auto owned = std::make_unique<ManualSerialQueue>("thread");
     thread = owned.get();
-    queues.emplace(std::move(owned));
-    queue = queues->makeQueue();
+    pool.emplace(std::move(owned));
+    strand = pool->makeQueue();
   }
 
   void submit(Strand& to, const std::string& text, std::size_t bytes = 0) {
@@ -30,118 +30,118 @@ class StrandPoolTest : public ::testing::Test {
 
   std::string ran;
   ManualSerialQueue* thread = nullptr;
-  std::optional<StrandPool> queues;
-  std::shared_ptr<Strand> queue;
+  std::optional<StrandPool> pool;
+  std::shared_ptr<Strand> strand;
 };
 
 TEST_F(StrandPoolTest, RunsPiecesInTheOrderOfSubmission) {
-  const auto other = queues->makeQueue();
-  submit(*queue, "a");
+  const auto other = pool->makeQueue();
+  submit(*strand, "a");
   submit(*other, "b");
-  submit(*queue, "c");
+  submit(*strand, "c");
   EXPECT_EQ(ran, "");
   thread->runAll();
   EXPECT_EQ(ran, "abc");
 }
 
-TEST_F(StrandPoolTest, HoldsThePiecesBehindTheOneThatWaitsUntilReleased) {
-  submit(*queue, "a");
-  submitHolding(*queue);
-  submit(*queue, "b");
-  submit(*queue, "c");
+TEST_F(StrandPoolTest, HoldsThePiecesBehindAHoldUntilReleased) {
+  submit(*strand, "a");
+  submitHolding(*strand);
+  submit(*strand, "b");
+  submit(*strand, "c");
   thread->runAll();
   EXPECT_EQ(ran, "a");
-  EXPECT_EQ(queues->heldCount(), 2U);
+  EXPECT_EQ(pool->heldCount(), 2U);
 
-  queue->interrupt([&] { queue->release(); });
-  submit(*queue, "d");
+  strand->interrupt([&] { strand->release(); });
+  submit(*strand, "d");
   thread->runAll();
   EXPECT_EQ(ran, "abcd");
-  EXPECT_EQ(queues->heldCount(), 0U);
+  EXPECT_EQ(pool->heldCount(), 0U);
 }
 
-TEST_F(StrandPoolTest, AHeldQueueHoldsUpNoOther) {
-  const auto other = queues->makeQueue();
-  submitHolding(*queue);
-  submit(*queue, "a");
+TEST_F(StrandPoolTest, AHeldStrandDoesNotDelayOthers) {
+  const auto other = pool->makeQueue();
+  submitHolding(*strand);
+  submit(*strand, "a");
   submit(*other, "b");
   thread->runAll();
   EXPECT_EQ(ran, "b");
 }
 
 TEST_F(StrandPoolTest, AReleasedPieceMayHoldAgain) {
-  submitHolding(*queue);
-  submit(*queue, "a");
-  submitHolding(*queue);
-  submit(*queue, "b");
+  submitHolding(*strand);
+  submit(*strand, "a");
+  submitHolding(*strand);
+  submit(*strand, "b");
   thread->runAll();
   for (const char* expected : {"a", "ab"}) {
-    queue->interrupt([&] { queue->release(); });
+    strand->interrupt([&] { strand->release(); });
     thread->runAll();
     EXPECT_EQ(ran, expected);
   }
 }
 
 TEST_F(StrandPoolTest, AnInterruptFromInsideAPieceRunsAtOnce) {
-  queue->submit(0, [&] {
-    queue->interrupt([&] { ran += "inner"; });
+  strand->submit(0, [&] {
+    strand->interrupt([&] { ran += "inner"; });
     ran += "outer";
   });
   thread->runAll();
   EXPECT_EQ(ran, "innerouter");
 }
 
-TEST_F(StrandPoolTest, DropsAndCountsWhatFindsNoRoomWhileHeld) {
-  submitHolding(*queue);
-  submit(*queue, "a", kMax / 2);
-  submit(*queue, "b", kMax / 2);
-  submit(*queue, "c", 1);
+TEST_F(StrandPoolTest, DropsAndCountsPiecesThatDoNotFitWhileHeld) {
+  submitHolding(*strand);
+  submit(*strand, "a", kMax / 2);
+  submit(*strand, "b", kMax / 2);
+  submit(*strand, "c", 1);
   thread->runAll();
-  EXPECT_EQ(queues->droppedCount(), 1U);
-  EXPECT_EQ(queues->heldCount(), 2U);
+  EXPECT_EQ(pool->droppedCount(), 1U);
+  EXPECT_EQ(pool->heldCount(), 2U);
 
-  queue->interrupt([&] {
-    EXPECT_EQ(queue->takeDroppedCount(), 1U);
-    queue->release();
+  strand->interrupt([&] {
+    EXPECT_EQ(strand->takeDroppedCount(), 1U);
+    strand->release();
   });
   thread->runAll();
   EXPECT_EQ(ran, "ac");
 }
 
-TEST_F(StrandPoolTest, TheRoomIsSharedAndComesBackWhenAQueueDies) {
-  auto other = queues->makeQueue();
+TEST_F(StrandPoolTest, TheRoomIsSharedAndIsFreedWhenAStrandEnds) {
+  auto other = pool->makeQueue();
   submitHolding(*other);
   submit(*other, "x", kMax - 1024);
-  submitHolding(*queue);
-  submit(*queue, "a", 1024);
+  submitHolding(*strand);
+  submit(*strand, "a", 1024);
   thread->runAll();
-  EXPECT_EQ(queues->droppedCount(), 1U);
+  EXPECT_EQ(pool->droppedCount(), 1U);
 
   other.reset();
-  EXPECT_EQ(queues->heldCount(), 0U);
-  submit(*queue, "b", 1024);
+  EXPECT_EQ(pool->heldCount(), 0U);
+  submit(*strand, "b", 1024);
   thread->runAll();
-  EXPECT_EQ(queues->droppedCount(), 1U);
-  EXPECT_EQ(queues->heldCount(), 1U);
+  EXPECT_EQ(pool->droppedCount(), 1U);
+  EXPECT_EQ(pool->heldCount(), 1U);
 }
 
 TEST_F(StrandPoolTest, EmptyPiecesTakeRoomToo) {
-  submitHolding(*queue);
-  for (std::size_t n = 0; n < kMax / 64; ++n) submit(*queue, "");
+  submitHolding(*strand);
+  for (std::size_t n = 0; n < kMax / 64; ++n) submit(*strand, "");
   thread->runAll();
-  EXPECT_GT(queues->droppedCount(), 0U);
+  EXPECT_GT(pool->droppedCount(), 0U);
 }
 
-TEST_F(StrandPoolTest, AtTheEndRunsWhatIsQueuedAndDropsWhatIsHeld) {
-  const auto other = queues->makeQueue();
+TEST_F(StrandPoolTest, TheDestructorRunsQueuedPiecesAndDropsHeldOnes) {
+  const auto other = pool->makeQueue();
   const auto kept = std::make_shared<int>(0);
-  submitHolding(*queue);
-  queue->submit(0, [kept, self = queue] {});  // refers to its own queue, as a worker's pieces do
+  submitHolding(*strand);
+  strand->submit(0, [kept, self = strand] {});  // refers to its own strand, as a worker's pieces do
   submit(*other, "b");
-  queues.reset();
+  pool.reset();
   EXPECT_EQ(ran, "b");
   EXPECT_EQ(kept.use_count(), 1);
-  queue->interrupt([&] { ran += "late"; });
+  strand->interrupt([&] { ran += "late"; });
   EXPECT_EQ(ran, "b");
 }
 

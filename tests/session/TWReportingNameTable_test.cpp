@@ -19,8 +19,7 @@ TEST(TWReportingNameTableTest, ComposesTheNamesOnce) {
   EXPECT_EQ(&table.eventNames(4, 2, 2), &table.eventNames(4, 2, 2));
 }
 
-// The table folds what has no text of its own into shared places; it must never give one thing another's
-// name.
+// Values without a text of their own share places in the table. No value may get the name of another.
 RC_GTEST_PROP(TWReportingNameTableProperty, GivesEveryCategoryTypeAndServiceItsOwnNames,
               (AudioEventCategory category, AudioEventType anyType, AudioServiceType anyService)) {
   const auto domain =

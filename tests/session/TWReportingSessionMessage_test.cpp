@@ -17,7 +17,7 @@ using ::testing::IsEmpty;
 
 class TWReportingSessionMessageTest : public ReportingTest {};
 
-TEST_F(TWReportingSessionMessageTest, StartsNeitherRedundantNorStartedNorAddressed) {
+TEST_F(TWReportingSessionMessageTest, ANewMessageIsNotRedundantNotStartedAndHasNoDestinations) {
   const TWReportingSessionMessage record({{"a", 1}}, 4, 1);
   EXPECT_EQ(record.category, 4U);
   EXPECT_EQ(record.type, 1);
@@ -62,7 +62,7 @@ TEST_F(TWReportingSessionMessageTest, ItsTimeIsItsTimestampOrZero) {
   EXPECT_EQ(message({})->epochTime(), 0.0);
 }
 
-TEST_F(TWReportingSessionMessageTest, SortsByTimeWithTheTimelessFirstAndKeepsTheOrderOfEqualTimes) {
+TEST_F(TWReportingSessionMessageTest, SortsByTimeStablyWithMessagesWithoutTimeFirst) {
   TWReportingSessionMessages messages{messageAt(5, {{"n", "a"}}), message({{"n", "b"}}),
                                       messageAt(1, {{"n", "c"}}), messageAt(5, {{"n", "d"}}),
                                       message({{"n", "e"}}),      messageAt(1, {{"n", "f"}})};
@@ -70,7 +70,7 @@ TEST_F(TWReportingSessionMessageTest, SortsByTimeWithTheTimelessFirstAndKeepsThe
   EXPECT_THAT(textsUnder("n", messages), ElementsAre("b", "e", "c", "f", "a", "d"));
 }
 
-TEST_F(TWReportingSessionMessageTest, SortsATimeThatIsNoNumberAsNone) {
+TEST_F(TWReportingSessionMessageTest, SortsATimeThatIsNotANumberAsNoTime) {
   TWReportingSessionMessages messages{messageAt(2, {{"n", "a"}}), messageAt(std::nan(""), {{"n", "b"}}),
                                       messageAt(1, {{"n", "c"}}), messageAt(-1, {{"n", "d"}})};
   TWReportingSessionMessage::sortMessages(messages);

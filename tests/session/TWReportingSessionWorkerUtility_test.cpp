@@ -33,7 +33,7 @@ TEST_F(CombineRapidMessagesTest, MergesABurstIntoItsFirstMessageUntilAKeyComesAg
   EXPECT_EQ(messages[2]->message.integer("K1"), 3);
 }
 
-TEST_F(CombineRapidMessagesTest, LeavesAMessageAfterALongPauseAloneAndGoesOnFromTheBurstsFirst) {
+TEST_F(CombineRapidMessagesTest, DoesNotMergeAMessageAfterALongPauseAndContinuesTheBurst) {
   const auto result = combine({messageAt(0, {{"K1", 1}, {"n", "a"}}), messageAt(5, {{"K2", 2}, {"n", "b"}}),
                                messageAt(5.5, {{"K3", 3}, {"n", "c"}})},
                               1.0);
@@ -51,7 +51,7 @@ TEST_F(CombineRapidMessagesTest, APauseOfTheMaximumIsTooLong) {
   EXPECT_EQ(combine({messageAt(0, {{"K1", 1}}), messageAt(1, {{"K2", 2}})}, 1.0).size(), 2U);
 }
 
-TEST_F(CombineRapidMessagesTest, APauseThatIsNoNumberIsTooLong) {
+TEST_F(CombineRapidMessagesTest, APauseThatIsNotANumberIsTooLong) {
   EXPECT_EQ(combine({messageAt(0, {{"K1", 1}}), messageAt(std::nan(""), {{"K2", 2}})}, 1.0).size(), 2U);
 }
 
@@ -68,9 +68,9 @@ TEST_F(CombineRapidMessagesTest, TheFirstKeyOfTheListCountsForAMessageThatHoldsS
   EXPECT_EQ(result.size(), 2U);  // K1 comes again
 }
 
-TEST_F(CombineRapidMessagesTest, OfNoMessagesMakesNone) { EXPECT_TRUE(combine({}, 1.0).empty()); }
+TEST_F(CombineRapidMessagesTest, ReturnsNothingForNoMessages) { EXPECT_TRUE(combine({}, 1.0).empty()); }
 
-TEST(VidroXYErrorTest, IsAMessageWithAnyKeyOfThatBeginning) {
+TEST(VidroXYErrorTest, IsAMessageThatHasAKeyWithThatPrefix) {
   const auto isError = [](const ValueMap& payload) {
     return TWReportingSessionWorkerUtility::isVidroXYerrorMessage(TWReportingSessionMessage(payload, 4, 1));
   };

@@ -44,7 +44,7 @@ std::vector<std::string> namesOf(const TWReportingSession::Workers& workers) {
 // A session without workers.
 class TWReportingSessionTest : public ReportingTest {};
 
-TEST_F(TWReportingSessionTest, BeginsUnknownUnstartedAndEmpty) {
+TEST_F(TWReportingSessionTest, ANewSessionIsUnknownUnstartedAndEmpty) {
   const auto session = makeSession(77);
   EXPECT_EQ(session->reporterID(), 77);
   EXPECT_THAT(session->processIdentifiers(), ElementsAre(4711));
@@ -61,7 +61,7 @@ TEST_F(TWReportingSessionTest, BeginsUnknownUnstartedAndEmpty) {
   EXPECT_EQ(session->workerInstanceCount(), 0U);
 }
 
-TEST_F(TWReportingSessionTest, SaysThatItWasMadeAndReleased) {
+TEST_F(TWReportingSessionTest, LogsAndTracesItsCreationAndRelease) {
   makeSession(77).reset();
   EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kInfo),
               ElementsAre("created reporting session for ID: 77", "deallocing this session 77"));
@@ -104,7 +104,7 @@ TEST_F(TWReportingSessionTest, AddsToItsConfiguration) {
   EXPECT_EQ(session->configuration(), (ValueMap{{"a", 1}, {"b", 2}, {"c", 3}}));
 }
 
-TEST_F(TWReportingSessionTest, TheQMApplicationNameServesUnlessTheMapNamesOneItself) {
+TEST_F(TWReportingSessionTest, TheQMApplicationNameIsUsedUnlessTheMapHasAnApplicationName) {
   const auto session = makeSession();
   const ValueMap quiet{{"QMHostApplicationDisplayID", "qm"}};
   EXPECT_TRUE(session->updateConfigurationWithContentsOfConfiguration(&quiet));
@@ -117,7 +117,7 @@ TEST_F(TWReportingSessionTest, TheQMApplicationNameServesUnlessTheMapNamesOneIts
 
 // Start and stop messages.
 
-TEST_F(TWReportingSessionTest, StartLeavesAStartMessageThatCountsWhatWasStored) {
+TEST_F(TWReportingSessionTest, StartStoresAMessageWithTheNumberOfStoredMessages) {
   const auto session = makeSession(77);
   session->sendMessage(message({{"a", 1}}));
   session->start();
@@ -137,7 +137,7 @@ TEST_F(TWReportingSessionTest, StartLeavesAStartMessageThatCountsWhatWasStored) 
   EXPECT_EQ(session->previousValues().find("method"), nullptr);
 }
 
-TEST_F(TWReportingSessionTest, AStopBeforeAnyStartLeavesOneStopMessage) {
+TEST_F(TWReportingSessionTest, AStopBeforeAnyStartStoresOneStopMessage) {
   const auto session = makeSession(77);
   session->stop();
   ASSERT_THAT(session->messages(), SizeIs(1));
@@ -166,7 +166,7 @@ TEST_F(TWReportingSessionTest, StartingAgainAddsOnlyASecondStartMessage) {
   EXPECT_THAT(test.log.linesOf("twrr", LogLevel::kInfo), SizeIs(2));
 }
 
-TEST_F(TWReportingSessionTest, KnowsSinceWhenItIsStarted) {
+TEST_F(TWReportingSessionTest, KnowsTheTimeOfItsStart) {
   const auto session = makeSession();
   EXPECT_EQ(session->startedAt(), std::nullopt);
   test.clock.advance(5);
@@ -179,7 +179,7 @@ TEST_F(TWReportingSessionTest, KnowsSinceWhenItIsStarted) {
   EXPECT_EQ(session->startedAt(), std::nullopt);
 }
 
-TEST_F(TWReportingSessionTest, StopForgetsTheMessagesAndCountsAndMayBeFollowedByAStart) {
+TEST_F(TWReportingSessionTest, StopDropsMessagesAndCountsAndAStartMayFollow) {
   const auto session = makeSession();
   session->start();
   session->sendMessage(message({{"a", 1}}));
@@ -225,9 +225,9 @@ TEST_F(TWReportingSessionTest, LogLinesBeginWithTheirFileAndLine) {
   EXPECT_EQ(line.find("created"), 25 + 1 + 5 + 1U);
 }
 
-// What a message goes through.
+// How a message is normalised, stored and remembered.
 
-TEST_F(TWReportingSessionTest, AMessageWithoutATimestampGetsTheTimeAndSaysThatItHadNone) {
+TEST_F(TWReportingSessionTest, AMessageWithoutATimestampGetsTheTimeAndAMark) {
   const auto record = message({{"a", 1}});
   TWReportingSession::addMissingDates(*record);
   EXPECT_EQ(record->message,
@@ -266,7 +266,7 @@ TEST_F(TWReportingSessionTest, SpacesInKeysBecomeUnderscoresAndOtherWhiteSpaceSt
   EXPECT_EQ(record->message, (ValueMap{{"tab\tkey", 2}, {"line\nkey", 3}, {"a_b__c", 1}, {"_", 4}}));
 }
 
-TEST_F(TWReportingSessionTest, ARepairedKeyTakesThePlaceOfOneThatStoodThere) {
+TEST_F(TWReportingSessionTest, ARepairedKeyReplacesAnExistingOne) {
   const auto record = message({{"a b", "first"}, {"a_b", "second"}});
   TWReportingSession::removeWhiteSpaceFromKeys(*record);
   EXPECT_EQ(record->message, (ValueMap{{"a_b", "first"}}));
@@ -278,7 +278,7 @@ TEST_F(TWReportingSessionTest, TheAudioTagIsCategoryAndTypeTogether) {
   EXPECT_EQ(record->message, (ValueMap{{"audiotag", "HAL_PlaybackStart"}}));
 }
 
-TEST_F(TWReportingSessionTest, AMessageWithoutAnApplicationGetsTheSessions) {
+TEST_F(TWReportingSessionTest, AMessageWithoutAnApplicationGetsTheSessionsApplication) {
   const auto session = makeSession();
   const auto nameAfter = [&](const ValueMap& payload) {
     const auto record = message(payload);
@@ -346,7 +346,7 @@ TEST_F(RedundancyTest, ARepeatedMessageIsRedundantAndNotStored) {
   EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kDebug), Contains("marking event redundant"));
 }
 
-TEST_F(RedundancyTest, TimesDoNotCount) {
+TEST_F(RedundancyTest, TimesAreIgnored) {
   const double now = test.clock.now();
   isRedundantAfterSending(
       {{"a", 1}, {"twreporting_timestamp", now}, {"processuptime_ms", 1}, {"systemuptime_sec", 1}});
@@ -355,7 +355,7 @@ TEST_F(RedundancyTest, TimesDoNotCount) {
   EXPECT_TRUE(isRedundantAfterSending({{"a", 1}, {"twreporting_timestamp", now + 9}}));
 }
 
-TEST_F(RedundancyTest, AMessageThatLacksAKeyOrHasOneMoreOrAnotherValueIsNot) {
+TEST_F(RedundancyTest, AMessageWithAMissingAddedOrChangedKeyIsNotRedundant) {
   const double now = test.clock.now();
   isRedundantAfterSending({{"a", 1}, {"b", 2}, {"twreporting_timestamp", now}});
   EXPECT_FALSE(isRedundantAfterSending({{"a", 1}, {"twreporting_timestamp", now}}));
@@ -369,14 +369,14 @@ TEST_F(RedundancyTest, ValuesCompareByValue) {
       {{"map", ValueMap{{"q", 1}, {"p", 1.0}}}, {"list", ValueArray{1.0, "x"}}, {"a", 1.0}}));
 }
 
-TEST_F(RedundancyTest, ErrorsNeverAre) {
+TEST_F(RedundancyTest, ErrorsAreNeverRedundant) {
   for (const auto& [category, type] : {std::pair<AudioEventCategory, AudioEventType>{4, 6}, {11, 1}}) {
     EXPECT_FALSE(isRedundantAfterSending({{"a", 1}}, category, type));
     EXPECT_FALSE(isRedundantAfterSending({{"a", 1}}, category, type));
   }
 }
 
-TEST_F(RedundancyTest, AnErrorCategoryWithADomainIsNoErrorCategory) {
+TEST_F(RedundancyTest, AnErrorCategoryWithADomainDoesNotCountAsAnError) {
   EXPECT_FALSE(isRedundantAfterSending({{"a", 1}}, 0x2000000B, 1));
   EXPECT_TRUE(isRedundantAfterSending({{"a", 1}}, 0x2000000B, 1));
 }
@@ -387,7 +387,7 @@ TEST_F(RedundancyTest, OnlyTheNewestOfTheSameCategoryAndTypeCounts) {
   EXPECT_FALSE(isRedundantAfterSending({{"a", "A"}}));
 }
 
-TEST_F(RedundancyTest, OtherCategoriesAndTypesInBetweenDoNotCount) {
+TEST_F(RedundancyTest, MessagesOfOtherCategoriesAndTypesDoNotMatter) {
   isRedundantAfterSending({{"a", "A"}}, 4, 1);
   EXPECT_FALSE(isRedundantAfterSending({{"a", "A"}}, 4, 2));
   EXPECT_FALSE(isRedundantAfterSending({{"a", "A"}}, 0x20000004, 1));
@@ -409,8 +409,9 @@ TEST_F(RedundancyTest, NothingIsRememberedAcrossAStop) {
   EXPECT_FALSE(isRedundantAfterSending({{"a", 1}}));
 }
 
-// The walk over the stored messages, newest first, that the session's index stands for.
-bool isRedundantByWalking(const TWReportingSession& session, const TWReportingSessionMessage& message) {
+// Decides by a search through the stored messages, newest first. The session's index must give the same
+// result.
+bool isRedundantBySearch(const TWReportingSession& session, const TWReportingSessionMessage& message) {
   if (message.type == 6 || message.category == 11) return false;
   const auto& stored = session.messages();
   for (auto earlier = stored.rbegin(); earlier != stored.rend(); ++earlier) {
@@ -426,7 +427,8 @@ bool isRedundantByWalking(const TWReportingSession& session, const TWReportingSe
   return false;
 }
 
-// Sends at stop, when the messages have just been sorted by time, and compares index and walk.
+// Sends messages at stop, when the session has just sorted its messages by time, and compares index and
+// search.
 class ProbingProducer final : public TWReportingSessionWorkerProducerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
@@ -438,9 +440,9 @@ class ProbingProducer final : public TWReportingSessionWorkerProducerProtocol {
       const auto record = std::make_shared<TWReportingSessionMessage>(
           ValueMap{{"a", value}, {"HostApplicationDisplayID", "x"}, {"twreporting_timestamp", 4e9}}, 4, 1);
       TWReportingSession::addAudioMessageTag(*record);
-      const bool walked = isRedundantByWalking(*owner, *record);
+      const bool expected = isRedundantBySearch(*owner, *record);
       owner->sendMessage(record);
-      EXPECT_EQ(record->isRedundant, walked) << value;
+      EXPECT_EQ(record->isRedundant, expected) << value;
     }
   }
 };
@@ -465,13 +467,13 @@ class WorkerTest : public ReportingTest {
  protected:
   WorkerTest() : ReportingTest(testWorkerClasses()) {}
 
-  // What the workers did since the last call.
-  std::vector<std::string> happened() { return journal.take(); }
+  // What the workers have done since the last call.
+  std::vector<std::string> takeEvents() { return journal.take(); }
 
   TestWorkerJournal journal;
 };
 
-TEST_F(WorkerTest, TheRegistrySortsTheClassesByWhatTheyAre) {
+TEST_F(WorkerTest, TheRegistryListsTheClassesByTheirRoles) {
   const TWReportingSessionWorkerRegistry registry(testWorkerClasses());
   EXPECT_THAT(namesOf(registry.allClasses()),
               ElementsAre("Trace", "Volume", "Gather", "Summary", "Input", "Metricon", "Energybook",
@@ -499,7 +501,7 @@ TEST_F(WorkerTest, AClassWhoseInstancesCannotBeMadeIsLeftOut) {
               ElementsAre("Worker does not implement initWithSession! Broken"));
 }
 
-TEST_F(WorkerTest, TheDaemonsClassesComeInTheRegistrysOrder) {
+TEST_F(WorkerTest, TheDaemonsClassesAreInTheRegistrysOrder) {
   EXPECT_THAT(namesOf(allWorkerClasses()),
               ElementsAre("TWReportingSessionTraceWorker", "TWReportingSessionVolumeMessagesWorker",
                           "TWReportingSessionGatherMessagesWorker", "TWReportingSessionSummaryWorker",
@@ -518,31 +520,31 @@ TEST_F(WorkerTest, TheRegistryIsFilledOnce) {
   EXPECT_EQ(classes, &TWReportingSession::getAllWorkerClasses());
 }
 
-TEST_F(WorkerTest, ANewSessionHoldsTheStartOnInitWorkersStarted) {
+TEST_F(WorkerTest, ANewSessionHasTheStartOnInitWorkersStarted) {
   const auto session = makeSession();
   EXPECT_THAT(namesOf(session->messageWorkers()),
               ElementsAre("Metricon", "Energybook", "MemoryLog", "Diagwire"));
   for (const auto& worker : session->messageWorkers()) EXPECT_TRUE(worker->started);
-  EXPECT_THAT(happened(),
+  EXPECT_THAT(takeEvents(),
               ElementsAre("Metricon started", "Energybook started", "MemoryLog started", "Diagwire started"));
 }
 
 TEST_F(WorkerTest, StartOnInitWorkersSeeMessagesSentBeforeStart) {
   const auto session = makeSession();
-  happened();
+  takeEvents();
   session->sendMessage(message({{"a", 1}}));
-  EXPECT_THAT(happened(),
+  EXPECT_THAT(takeEvents(),
               ElementsAre("Metricon got a=1", "Energybook got a=1", "MemoryLog got a=1", "Diagwire got a=1"));
 }
 
 TEST_F(WorkerTest, AtStartConsumersStartFirstThenProducersThenTheRest) {
   const auto session = makeSession();
-  happened();
+  takeEvents();
   session->start();
-  EXPECT_THAT(happened(), ElementsAre("Summary started", "Capsa started", "DP started", "Rtc started",
-                                      "IssueDraft started", "Volume started", "Gather started",
-                                      "Input started", "DriverSnapshot started", "SystemMonitor started",
-                                      "Trace started", "JsonFile started"));
+  EXPECT_THAT(takeEvents(), ElementsAre("Summary started", "Capsa started", "DP started", "Rtc started",
+                                        "IssueDraft started", "Volume started", "Gather started",
+                                        "Input started", "DriverSnapshot started", "SystemMonitor started",
+                                        "Trace started", "JsonFile started"));
 }
 
 TEST_F(WorkerTest, AfterStartEveryClassHasExactlyOneWorkerAlsoAfterASecondStart) {
@@ -560,21 +562,21 @@ TEST_F(WorkerTest, AfterStartEveryClassHasExactlyOneWorkerAlsoAfterASecondStart)
 TEST_F(WorkerTest, AtStopProducersStopFirstThenConsumersThenTheRest) {
   const auto session = makeSession();
   session->start();
-  happened();
+  takeEvents();
   session->stop();
-  EXPECT_THAT(happened(), ElementsAre("Volume stopped", "Gather stopped", "Summary stopped", "Input stopped",
-                                      "DriverSnapshot stopped", "SystemMonitor stopped", "Metricon stopped",
-                                      "Energybook stopped", "MemoryLog stopped", "Diagwire stopped",
-                                      "Capsa stopped", "DP stopped", "Rtc stopped", "IssueDraft stopped",
-                                      "Trace stopped", "JsonFile stopped"));
+  EXPECT_THAT(takeEvents(), ElementsAre("Volume stopped", "Gather stopped", "Summary stopped",
+                                        "Input stopped", "DriverSnapshot stopped", "SystemMonitor stopped",
+                                        "Metricon stopped", "Energybook stopped", "MemoryLog stopped",
+                                        "Diagwire stopped", "Capsa stopped", "DP stopped", "Rtc stopped",
+                                        "IssueDraft stopped", "Trace stopped", "JsonFile stopped"));
   for (const auto& worker : session->messageWorkers()) EXPECT_FALSE(worker->started);
 }
 
 TEST_F(WorkerTest, AStopWithoutAStartStopsNoWorker) {
   const auto session = makeSession();
-  happened();
+  takeEvents();
   session->stop();
-  EXPECT_THAT(happened(), IsEmpty());
+  EXPECT_THAT(takeEvents(), IsEmpty());
 }
 
 TEST_F(WorkerTest, WorkersAreKeptAndStartedAgain) {
@@ -582,51 +584,51 @@ TEST_F(WorkerTest, WorkersAreKeptAndStartedAgain) {
   session->start();
   const auto workers = session->messageWorkers();
   session->stop();
-  happened();
+  takeEvents();
   session->start();
   EXPECT_EQ(session->messageWorkers(), workers);
-  EXPECT_THAT(happened(), AllOf(SizeIs(16), Each(EndsWith("started"))));
+  EXPECT_THAT(takeEvents(), AllOf(SizeIs(16), Each(EndsWith("started"))));
 }
 
-TEST_F(WorkerTest, ARedundantMessageReachesOnlyThoseThatAskForIt) {
+TEST_F(WorkerTest, ARedundantMessageReachesOnlyWorkersThatWantIt) {
   const auto session = makeSession();
   session->start();
   session->sendMessage(message({{"a", 1}}));
-  happened();
+  takeEvents();
   session->sendMessage(message({{"a", 1}, {"systemuptime_sec", 5}}));
-  EXPECT_THAT(happened(), ElementsAre("MemoryLog got a=1 redundant", "Capsa got a=1 redundant"));
+  EXPECT_THAT(takeEvents(), ElementsAre("MemoryLog got a=1 redundant", "Capsa got a=1 redundant"));
   EXPECT_EQ(session->previousValues().integer("systemuptime_sec"), 5);
 }
 
 TEST_F(WorkerTest, AMessageWithDestinationsReachesOnlyThem) {
   const auto session = makeSession();
   session->start();
-  happened();
+  takeEvents();
   const auto record = message({{"a", 1}});
   record->destinationWorkers = {testWorkerClass("Rtc"),
                                 testWorkerClass("JsonFile")};  // the latter is no consumer
   session->sendMessage(record);
-  EXPECT_THAT(happened(), ElementsAre("Rtc got a=1"));
+  EXPECT_THAT(takeEvents(), ElementsAre("Rtc got a=1"));
 }
 
 TEST_F(WorkerTest, AStoppedWorkerGetsNothingWhileTheSessionIsStopped) {
   const auto session = makeSession();
   session->start();
   session->stop();
-  happened();
+  takeEvents();
   session->sendMessage(message({{"a", 1}}));
-  EXPECT_THAT(happened(), IsEmpty());
+  EXPECT_THAT(takeEvents(), IsEmpty());
 }
 
-TEST_F(WorkerTest, WhatAProducerDerivesAtStopPassesTheRunningConsumersAndIsStored) {
+TEST_F(WorkerTest, AMessageDerivedAtStopReachesTheRunningConsumersAndIsStored) {
   const auto session = makeSession();
   session->start();
-  happened();
+  takeEvents();
   std::size_t storedAtTheEnd = 0;
   journal.onEvent("Volume stopped", [&] { session->sendMessage(message({{"a", "derived"}}, 14, 11)); });
   journal.onEvent("JsonFile stopped", [&] { storedAtTheEnd = session->messages().size(); });
   session->stop();
-  EXPECT_THAT(happened(), Contains("Metricon got a=derived"));
+  EXPECT_THAT(takeEvents(), Contains("Metricon got a=derived"));
   EXPECT_EQ(storedAtTheEnd, 3U);  // start, stop, derived
 }
 
@@ -646,13 +648,13 @@ TEST_F(WorkerTest, AWorkerWhoseStartFailsGetsNothingAndIsTriedAgainAtTheNextStar
   journal.failStart("Capsa");
   const auto session = makeSession();
   session->start();
-  EXPECT_THAT(happened(), Contains("Capsa failed to start"));
+  EXPECT_THAT(takeEvents(), Contains("Capsa failed to start"));
   session->sendMessage(message({{"a", 1}}));
-  EXPECT_THAT(happened(), Not(Contains("Capsa got a=1")));
+  EXPECT_THAT(takeEvents(), Not(Contains("Capsa got a=1")));
   session->stop();
-  EXPECT_THAT(happened(), Not(Contains("Capsa stopped")));
+  EXPECT_THAT(takeEvents(), Not(Contains("Capsa stopped")));
   session->start();
-  EXPECT_THAT(happened(), Contains("Capsa failed to start"));
+  EXPECT_THAT(takeEvents(), Contains("Capsa failed to start"));
 }
 
 TEST_F(WorkerTest, AWorkerThatIsNotMadeIsTriedAgainAtTheNextStart) {
@@ -669,7 +671,7 @@ TEST_F(WorkerTest, AWorkerThatIsNotMadeIsTriedAgainAtTheNextStart) {
   EXPECT_EQ(session->workerInstanceCount(), 16U);
 }
 
-TEST_F(WorkerTest, AWorkerWithoutAStartIsSimplyStarted) {
+TEST_F(WorkerTest, AWorkerWithoutAStartFunctionCountsAsStarted) {
   const auto session = makeSession();
   session->start();
   EXPECT_THAT(
@@ -692,7 +694,7 @@ TEST_F(WorkerTest, ASingleMessageSessionGetsOnlyWorkersThatHandleOne) {
                "reporterID=77"));
 }
 
-TEST_F(WorkerTest, OfAClassThatIsMadeLaterASingleMessageSessionMakesOnlyTheHandlingOnes) {
+TEST_F(WorkerTest, ASingleMessageSessionMakesOnlyWorkersThatHandleOneAtItsStart) {
   useWorkers(testWorkerClassesWithoutStartOnInit());
   const auto session = makeSession();
   session->setSingleMessageSession(true);
@@ -717,13 +719,13 @@ TEST_F(WorkerTest, EachStepOfAWorkersLifeIsLogged) {
   }
 }
 
-TEST_F(WorkerTest, AWorkerMaySendFromWithinAMessage) {
+TEST_F(WorkerTest, AWorkerMaySendWhileItHandlesAMessage) {
   const auto session = makeSession();
   session->start();
-  happened();
+  takeEvents();
   journal.onEvent("Summary got a=1", [&] { session->sendMessage(message({{"a", 2}})); });
   session->sendMessage(message({{"a", 1}}));
-  EXPECT_THAT(happened(), AllOf(Contains("Metricon got a=2"), Contains("Metricon got a=1")));
+  EXPECT_THAT(takeEvents(), AllOf(Contains("Metricon got a=2"), Contains("Metricon got a=1")));
 }
 
 TEST_F(WorkerTest, WorkersDoNotKeepTheirSessionAlive) {
@@ -734,7 +736,7 @@ TEST_F(WorkerTest, WorkersDoNotKeepTheirSessionAlive) {
   EXPECT_TRUE(workers.front()->session.expired());
 }
 
-// What a client's sessions may keep.
+// The budget.
 
 class BudgetTest : public ReportingTest {
  protected:
@@ -750,7 +752,7 @@ class BudgetTest : public ReportingTest {
   std::shared_ptr<KeptBytesBudget> budget;
 };
 
-TEST_F(BudgetTest, PastItMessagesAreDeliveredButNotKeptWhichIsSaidOnceAndCountedAtStop) {
+TEST_F(BudgetTest, MessagesOverTheBudgetAreDeliveredButNotKeptAndLogged) {
   TestWorkerJournal journal;
   useWorkers(testWorkerClasses());
   const auto session = makeSessionWithin(20'000);
@@ -770,8 +772,9 @@ TEST_F(BudgetTest, PastItMessagesAreDeliveredButNotKeptWhichIsSaidOnceAndCounted
               ElementsAre(HasSubstr("delivered but not kept. reporterID=77"), unkept(10 - kept)));
 }
 
-// Neither its place among the messages nor its previous values count for themselves.
-TEST_F(BudgetTest, AMessageThatIsNotKeptCountsOnce) {
+// A message takes bytes as a stored message and as previous values. It is counted only once when neither
+// fits.
+TEST_F(BudgetTest, AnUnkeptMessageIsCountedOnce) {
   const auto session = makeSessionWithin(2'000);
   session->start();
   for (int n = 0; n < 11; ++n) session->sendMessage(message({{"a", n}, {"text", std::string(3'000, 'x')}}));
@@ -779,7 +782,7 @@ TEST_F(BudgetTest, AMessageThatIsNotKeptCountsOnce) {
   EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kError), Contains(unkept(11)));
 }
 
-TEST_F(BudgetTest, ARedundantMessageIsNotKeptByTheRuleAndCountsNowhere) {
+TEST_F(BudgetTest, ARedundantMessageIsNotCountedAsUnkept) {
   const auto session = makeSessionWithin(6'000);
   session->start();
   const ValueMap payload{{"text", std::string(1'800, 'x')}};
@@ -789,14 +792,14 @@ TEST_F(BudgetTest, ARedundantMessageIsNotKeptByTheRuleAndCountsNowhere) {
   EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kError), Not(Contains(HasSubstr("count="))));
 }
 
-TEST_F(BudgetTest, ASessionThatWasNeverStartedSaysAtItsStopWhatWasNotKept) {
+TEST_F(BudgetTest, ANeverStartedSessionLogsUnkeptMessagesAtItsStop) {
   const auto session = makeSessionWithin(2'000);
   session->sendMessage(message({{"text", std::string(3'000, 'x')}}));
   session->stop();
   EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kError), Contains(unkept(1)));
 }
 
-TEST_F(BudgetTest, ASessionSaysAtItsEndWhatWasNotKeptSinceItLastSaidSo) {
+TEST_F(BudgetTest, ASessionLogsAtItsEndTheUnkeptMessagesNotLoggedYet) {
   auto session = makeSessionWithin(2'000);
   session->start();
   session->sendMessage(message({{"a", 1}, {"text", std::string(3'000, 'x')}}));
@@ -808,7 +811,7 @@ TEST_F(BudgetTest, ASessionSaysAtItsEndWhatWasNotKeptSinceItLastSaidSo) {
   EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kError), ElementsAre(unkept(1)));
 }
 
-TEST_F(BudgetTest, AStopGivesBackWhatTheMessagesTookAndAReleaseEverything) {
+TEST_F(BudgetTest, AStopGivesBackTheBytesOfTheMessagesAndTheReleaseAllBytes) {
   auto session = makeSessionWithin(1'000'000);
   session->start();
   session->sendMessage(message({{"a", std::string(10'000, 'x')}}));

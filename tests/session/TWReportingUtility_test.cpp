@@ -18,7 +18,7 @@ using ::testing::IsEmpty;
 
 class TWReportingUtilityTest : public ReportingTest {};
 
-// What a category is called.
+// Names of categories.
 
 TEST_F(TWReportingUtilityTest, NamesEveryBaseCategory) {
   const std::vector<std::string> texts{
@@ -40,10 +40,10 @@ TEST_F(TWReportingUtilityTest, PutsTheEventDomainBeforeTheBaseCategory) {
   EXPECT_EQ(TWReportingUtilityCategoryString(0x80000010), "Toolbox_HearingHealth");
 }
 
-TEST_F(TWReportingUtilityTest, LeavesTheUnderscoreOfADomainWithoutAName) {
+TEST_F(TWReportingUtilityTest, ADomainWithoutANameGivesOnlyAnUnderscore) {
   EXPECT_EQ(TWReportingUtilityCategoryString(0x00030001), "_Generic");
   EXPECT_EQ(TWReportingUtilityCategoryString(0x01000003), "_Input");
-  EXPECT_EQ(TWReportingUtilityCategoryString(0x0C000003), "_Input");  // two domains at once are none
+  EXPECT_EQ(TWReportingUtilityCategoryString(0x0C000003), "_Input");  // two domains at once have no name
   EXPECT_EQ(TWReportingUtilityCategoryString(0xFFFFFFFE), "_Undefined");
 }
 
@@ -55,7 +55,7 @@ TEST_F(TWReportingUtilityTest, CallsABaseOutsideTheTableUndefined) {
   EXPECT_EQ(TWReportingUtilityCategoryString(0xFFFFFFFF), "Undefined");
 }
 
-TEST_F(TWReportingUtilityTest, ReadsNoDomainBackAndNoOtherCase) {
+TEST_F(TWReportingUtilityTest, DoesNotReadDomainsOrOtherLetterCase) {
   EXPECT_EQ(TWReportingUtilityCategoryFromString("HAL_Playback"), 0xFFFFFFFF);
   EXPECT_EQ(TWReportingUtilityCategoryFromString("Playback"), 4U);
   EXPECT_EQ(TWReportingUtilityCategoryFromString("playback"), 0xFFFFFFFF);
@@ -64,7 +64,7 @@ TEST_F(TWReportingUtilityTest, ReadsNoDomainBackAndNoOtherCase) {
   EXPECT_EQ(TWReportingUtilityCategoryFromString(""), 0xFFFFFFFF);
 }
 
-// What a type is called.
+// Names of types.
 
 TEST_F(TWReportingUtilityTest, NamesEveryTypeAndReadsItBack) {
   const std::vector<std::string> texts{"Generic",
@@ -97,7 +97,7 @@ TEST_F(TWReportingUtilityTest, NamesMemoryLogButDoesNotReadItBack) {
   EXPECT_EQ(TWReportingUtilityTypeFromString("MemoryLog"), 0);
 }
 
-TEST_F(TWReportingUtilityTest, ReadsATypeItDoesNotKnowAsGeneric) {
+TEST_F(TWReportingUtilityTest, ReadsAnUnknownTypeAsGeneric) {
   EXPECT_EQ(TWReportingUtilityTypeFromString("start"), 0);
   EXPECT_EQ(TWReportingUtilityTypeFromString("ListeningEnhancement"), 0);
   EXPECT_EQ(TWReportingUtilityTypeFromString(""), 0);
@@ -110,7 +110,7 @@ TEST_F(TWReportingUtilityTest, CallsATypeOutsideTheTableGenericAndTheLastUnknown
   EXPECT_EQ(TWReportingUtilityTypeFromString("Unknown"), 65535);
 }
 
-// What a service is called.
+// Names of services.
 
 TEST_F(TWReportingUtilityTest, NamesEveryServiceAndReadsItBack) {
   const std::vector<std::string> names{
@@ -154,7 +154,7 @@ TEST_F(TWReportingUtilityTest, TheMinimumPlayingTimeIsHalfASecondForEveryService
 
 TEST_F(TWReportingUtilityTest, AlwaysSendsMessages) { EXPECT_TRUE(TWReportingUtilityShouldSendMessage()); }
 
-// Stamps.
+// Dates.
 
 TEST_F(TWReportingUtilityTest, StampsACopyWithTheThreeTimes) {
   test.clock.setNow(1'700'000'000.25);
@@ -177,7 +177,7 @@ TEST_F(TWReportingUtilityTest, ProcessorTimeIsConvertedInSinglePrecision) {
   EXPECT_EQ(TWReportingUtilityAddDates({}).integer("processuptime_ms"), 100'000'000);
 }
 
-// Figures.
+// Numbers.
 
 TEST_F(TWReportingUtilityTest, RoundsHalvesAwayFromZero) {
   EXPECT_EQ(TWReportingUtilityRoundWithPlaces(2.5, 0), 3.0);
@@ -197,7 +197,9 @@ TEST_F(TWReportingUtilityTest, TakesTheNearestBucket) {
   EXPECT_EQ(bucket(100, {0, 5, 10, 20}, 1), "20.0");
 }
 
-TEST_F(TWReportingUtilityTest, TakesTheLaterOfTwoBucketsAsNear) { EXPECT_EQ(bucket(7.5, {5, 10}, 0), "10"); }
+TEST_F(TWReportingUtilityTest, TakesTheLaterOfTwoEquallyNearBuckets) {
+  EXPECT_EQ(bucket(7.5, {5, 10}, 0), "10");
+}
 
 TEST_F(TWReportingUtilityTest, StopsAtTheFirstFartherBucketEvenWhenTheyDescend) {
   EXPECT_EQ(bucket(1, {5, 20, 1}, 0), "5");
@@ -208,7 +210,7 @@ TEST_F(TWReportingUtilityTest, GivesNoBucketWithoutBuckets) {
   EXPECT_EQ(TWReportingUtilityBucketNumberToString(1, {}, 1), std::nullopt);
 }
 
-TEST_F(TWReportingUtilityTest, ShowsABucketWithOneToSoManyFractionDigits) {
+TEST_F(TWReportingUtilityTest, WritesABucketWithOneUpToTheGivenFractionDigits) {
   EXPECT_EQ(bucket(0.3, {0.25, 0.3125}, 4), "0.3125");
   EXPECT_EQ(bucket(0.5, {0.5}, 4), "0.5");
   EXPECT_EQ(bucket(1, {1}, 4), "1.0");
@@ -253,7 +255,7 @@ TEST_F(TWReportingUtilityTest, WaitReturnsAtOnceWhenTheFlagIsSet) {
   EXPECT_THAT(test.log.linesOf("twrt"), IsEmpty());
 }
 
-TEST_F(TWReportingUtilityTest, WaitGivesUpAfterOneTimeOutWithoutASignal) {
+TEST_F(TWReportingUtilityTest, WaitEndsAfterOneTimeOutWithoutASignal) {
   TWReportingCondition condition;
   const bool flag = false;
   EXPECT_FALSE(
@@ -273,7 +275,7 @@ TEST_F(TWReportingUtilityTest, WaitEndsWithTheSignal) {
   EXPECT_THAT(test.log.textsOf("twrt", LogLevel::kError), IsEmpty());
 }
 
-TEST_F(TWReportingUtilityTest, WaitGoesOnWaitingWhenItIsWokenWithoutTheFlag) {
+TEST_F(TWReportingUtilityTest, WaitContinuesAfterAWakeUpWithoutTheFlag) {
   TWReportingCondition condition;
   bool flag = false;
   std::thread waiter([&] {
@@ -282,7 +284,7 @@ TEST_F(TWReportingUtilityTest, WaitGoesOnWaitingWhenItIsWokenWithoutTheFlag) {
   });
   while (test.log.textsOf("twrt").empty()) std::this_thread::yield();
   {
-    const MutexLock lock(condition.mutex);  // taken only once the waiter waits
+    const MutexLock lock(condition.mutex);  // the waiter holds it until it waits
     condition.signalled.notifyOne();
   }
   while (test.log.textsOf("twrt").size() < 2) std::this_thread::yield();
@@ -293,11 +295,11 @@ TEST_F(TWReportingUtilityTest, WaitGoesOnWaitingWhenItIsWokenWithoutTheFlag) {
 
 // Process-wide values.
 
-TEST_F(TWReportingUtilityTest, IsNoInternalBuildUnlessTheDeviceSaysSo) {
+TEST_F(TWReportingUtilityTest, IsAnInternalBuildOnlyIfTheDeviceSaysSo) {
   EXPECT_FALSE(TWReportingUtilityIsInternalBuild());
 }
 
-TEST_F(TWReportingUtilityTest, AsksTheDeviceOnceWhetherTheBuildIsInternal) {
+TEST_F(TWReportingUtilityTest, AsksTheDeviceOnceWhetherItIsAnInternalBuild) {
   makeInternalBuild();
   EXPECT_TRUE(TWReportingUtilityIsInternalBuild());
   test.deviceFacts.set("InternalBuild", false);
