@@ -22,7 +22,7 @@ void ObservableMap::Observation::end() {
   const std::shared_ptr<ObservableMap> map = std::move(map_);
   if (map == nullptr) return;
   Observing ended;  // what the observer holds is let go after the lock
-  const std::lock_guard lock(*map);
+  const RecursiveMutexLock lock(map->mutex_);
   const auto found = map->observers_.find(identifier_);
   if (found == map->observers_.end()) return;
   ended = std::move(found->second);
@@ -30,13 +30,13 @@ void ObservableMap::Observation::end() {
 }
 
 std::optional<ValueMap> ObservableMap::find(std::string_view key) const {
-  const std::lock_guard lock(*this);
+  const RecursiveMutexLock lock(mutex_);
   const auto found = values_.find(key);
   return found == values_.end() ? std::nullopt : std::optional(found->second);
 }
 
 void ObservableMap::set(std::string_view key, ValueMap value) {
-  const std::lock_guard lock(*this);
+  const RecursiveMutexLock lock(mutex_);
   values_.insert_or_assign(std::string(key), std::move(value));
   wake(key);
 }
@@ -56,7 +56,7 @@ void ObservableMap::wake(std::string_view key) {
 
 ObservableMap::Observation ObservableMap::observe(const std::shared_ptr<ObservableMap>& map,
                                                   std::string_view key, Observer observer) {
-  const std::lock_guard lock(*map);
+  const RecursiveMutexLock lock(map->mutex_);
   const std::uint64_t identifier = ++map->lastIdentifier_;
   map->observers_.emplace(identifier,
                           Observing{std::string(key), std::make_shared<const Observer>(std::move(observer))});
@@ -64,7 +64,7 @@ ObservableMap::Observation ObservableMap::observe(const std::shared_ptr<Observab
 }
 
 std::size_t ObservableMap::observerCount() const {
-  const std::lock_guard lock(*this);
+  const RecursiveMutexLock lock(mutex_);
   return observers_.size();
 }
 

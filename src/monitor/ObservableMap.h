@@ -5,11 +5,11 @@
 #include <functional>
 #include <map>
 #include <memory>
-#include <mutex>
 #include <optional>
 #include <string>
 #include <string_view>
 
+#include "values/Mutex.h"
 #include "values/Value.h"
 
 namespace tonewerk {
@@ -69,9 +69,8 @@ class ObservableMap {
                              Observer observer);
   std::size_t observerCount() const;
 
-  // BasicLockable: what is done between the two is one step to others.
-  void lock() const { mutex_.lock(); }
-  void unlock() const { mutex_.unlock(); }
+  // What is done while it is held is one step to others.
+  RecursiveMutex& mutex() const RETURN_CAPABILITY(mutex_) { return mutex_; }
 
  private:
   struct Observing {
@@ -79,12 +78,12 @@ class ObservableMap {
     std::shared_ptr<const Observer> observer;  // shared with a call that is under way
   };
 
-  void wake(std::string_view key);
+  void wake(std::string_view key) REQUIRES(mutex_);
 
-  mutable std::recursive_mutex mutex_;  // guards all below
-  std::map<std::string, ValueMap, std::less<>> values_;
-  std::map<std::uint64_t, Observing> observers_;  // by identifier, which ascends
-  std::uint64_t lastIdentifier_ = 0;
+  mutable RecursiveMutex mutex_;
+  std::map<std::string, ValueMap, std::less<>> values_ GUARDED_BY(mutex_);
+  std::map<std::uint64_t, Observing> observers_ GUARDED_BY(mutex_);  // by identifier, which ascends
+  std::uint64_t lastIdentifier_ GUARDED_BY(mutex_) = 0;
 };
 
 }  // namespace tonewerk

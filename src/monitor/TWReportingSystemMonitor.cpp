@@ -2,7 +2,6 @@
 #include "monitor/TWReportingSystemMonitor.h"
 
 #include <cmath>
-#include <mutex>
 #include <utility>
 
 #include "platform/Clock.h"
@@ -31,27 +30,34 @@ const Platform& platform() { return TWReportingContext::current().platform(); }
 struct OneMonitor {
   // Held while the monitor is made or dropped, so that there are never two. Not needed for reading: whoever
   // reads may hold the map's lock, which making the monitor takes.
-  std::mutex making;
-  std::mutex reading;  // guards `monitor`; nothing else is locked under it
-  std::shared_ptr<TWReportingSystemMonitor> monitor;
+  Mutex making;
+  Mutex reading;  // nothing else is locked under it
+  std::shared_ptr<TWReportingSystemMonitor> monitor GUARDED_BY(reading);
 
   static OneMonitor& ofProcess() { return TWReportingContext::current().singles().get<OneMonitor>(); }
 
   std::shared_ptr<TWReportingSystemMonitor> get() {
-    const std::lock_guard lock(reading);
+    const MutexLock lock(reading);
     return monitor;
   }
-  std::shared_ptr<TWReportingSystemMonitor> exchange(std::shared_ptr<TWReportingSystemMonitor> other) {
-    const std::lock_guard lock(reading);
+  std::shared_ptr<TWReportingSystemMonitor> exchange(std::shared_ptr<TWReportingSystemMonitor> other)
+      REQUIRES(making) {
+    const MutexLock lock(reading);
     return std::exchange(monitor, std::move(other));
   }
 };
+
+std::vector<std::string> namesOf(const ValueMap& features) {
+  std::vector<std::string> names;
+  for (const ValueMap::Entry& feature : features) names.push_back(feature.key.string());
+  return names;
+}
 
 }  // namespace
 
 void TWReportingSystemMonitor::initializeWithQueue(SerialQueue& queue) {
   OneMonitor& one = OneMonitor::ofProcess();
-  const std::lock_guard lock(one.making);
+  const MutexLock lock(one.making);
   if (one.get() == nullptr) one.exchange(initWithQueue(queue));
 }
 
@@ -61,16 +67,13 @@ std::shared_ptr<ObservableMap> TWReportingSystemMonitor::getSystemMonitorDiction
 }
 
 std::vector<std::string> TWReportingSystemMonitor::getSystemMonitorKeys() {
-  std::vector<std::string> keys;
-  if (const auto monitor = OneMonitor::ofProcess().get()) {
-    for (const ValueMap::Entry& feature : monitor->features_) keys.push_back(feature.key.string());
-  }
-  return keys;
+  const auto monitor = OneMonitor::ofProcess().get();
+  return monitor == nullptr ? std::vector<std::string>() : monitor->featureNames_;
 }
 
 void TWReportingSystemMonitor::reset() {
   OneMonitor& one = OneMonitor::ofProcess();
-  const std::lock_guard lock(one.making);
+  const MutexLock lock(one.making);
   if (const auto monitor = one.exchange(nullptr)) monitor->clear();
 }
 
@@ -85,6 +88,7 @@ TWReportingSystemMonitor::TWReportingSystemMonitor(Private, SerialQueue& queue)
     : defaults_(TWReportingDefaults()),
       queue_(queue),
       notifications_(platform().notifications),
+      featureNames_(namesOf(featureTable())),
       features_(featureTable()) {}
 
 TWReportingSystemMonitor::~TWReportingSystemMonitor() { clear(); }
@@ -102,14 +106,16 @@ ValueMap TWReportingSystemMonitor::TWReportingDefaults() {
 }
 
 void TWReportingSystemMonitor::populateInitialValues() {
+  const RecursiveMutexLock lock(systemMonitorDictionary_->mutex());
   infoLog(category(), "populateInitialValues %@", features_);
-  const std::lock_guard lock(*systemMonitorDictionary_);
   for (const ValueMap::Entry& feature : features_) {
     if (const auto state = getFeatureState(feature.key)) systemMonitorDictionary_->set(feature.key, *state);
   }
 }
 
 void TWReportingSystemMonitor::listenForFeatureStateChanges() {
+  // A handler that runs at once waits here until its token can be found.
+  const RecursiveMutexLock lock(systemMonitorDictionary_->mutex());
   infoLog(category(), "listening for features %@", features_);
   const ValueMap features = features_;
   for (const ValueMap::Entry& feature : features) {
@@ -119,8 +125,6 @@ void TWReportingSystemMonitor::listenForFeatureStateChanges() {
 }
 
 void TWReportingSystemMonitor::listenFor(const std::string& name, const std::string& notification) {
-  // A handler that runs at once waits here until its token can be found.
-  const std::lock_guard lock(*systemMonitorDictionary_);
   const auto [status, token] = notifications_.registerHandler(
       notification, queue_, [weak = weak_from_this(), name](NotificationService::Token told) {
         if (const auto monitor = weak.lock()) monitor->featureChanged(name, told);
@@ -133,7 +137,7 @@ void TWReportingSystemMonitor::listenFor(const std::string& name, const std::str
 
 void TWReportingSystemMonitor::featureChanged(std::string_view name, NotificationService::Token token) {
   infoLog(category(), "feature changes featureName=%@ token=%i", name, token);
-  const std::lock_guard lock(*systemMonitorDictionary_);
+  const RecursiveMutexLock lock(systemMonitorDictionary_->mutex());
   std::optional<ValueMap> state = getFeatureState(name);
   if (state && state != systemMonitorDictionary_->find(name)) {
     systemMonitorDictionary_->set(name, std::move(*state));
@@ -147,6 +151,7 @@ const ValueMap* TWReportingSystemMonitor::descriptorOf(std::string_view name) co
 
 std::optional<ValueMap> TWReportingSystemMonitor::getFeatureState(std::string_view name) const {
   defaultLog(category(), "getting feature %@", name);
+  const RecursiveMutexLock lock(systemMonitorDictionary_->mutex());
   const ValueMap* descriptor = descriptorOf(name);
   if (descriptor == nullptr || !descriptor->contains(kFeatureDomain)) return std::nullopt;
 
@@ -167,7 +172,7 @@ std::optional<ValueMap> TWReportingSystemMonitor::getFeatureState(std::string_vi
 }
 
 void TWReportingSystemMonitor::clear() {
-  const std::lock_guard lock(*systemMonitorDictionary_);
+  const RecursiveMutexLock lock(systemMonitorDictionary_->mutex());
   for (const ValueMap::Entry& feature : features_) {
     const ValueMap* descriptor = feature.value.asMap();
     if (!descriptor->contains(kFeatureNotifyToken)) continue;

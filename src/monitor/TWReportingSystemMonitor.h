@@ -64,15 +64,17 @@ class TWReportingSystemMonitor : public std::enable_shared_from_this<TWReporting
 
  private:
   void featureChanged(std::string_view name, NotificationService::Token token);
-  const ValueMap* descriptorOf(std::string_view name) const;
-  void listenFor(const std::string& name, const std::string& notification);
+  const ValueMap* descriptorOf(std::string_view name) const REQUIRES(systemMonitorDictionary_->mutex());
+  void listenFor(const std::string& name, const std::string& notification)
+      REQUIRES(systemMonitorDictionary_->mutex());
 
   const ValueMap defaults_;
   SerialQueue& queue_;
   NotificationService& notifications_;
   const std::shared_ptr<ObservableMap> systemMonitorDictionary_ = std::make_shared<ObservableMap>();
-  // A descriptor a feature, by its name. Under the map's lock once the first handler is registered.
-  ValueMap features_;
+  const std::vector<std::string> featureNames_;  // in the order of the table
+  // A descriptor a feature, by its name.
+  ValueMap features_ GUARDED_BY(systemMonitorDictionary_->mutex());
 };
 
 }  // namespace tonewerk

@@ -157,7 +157,7 @@ TEST_F(ObservableMapTest, ReadingJudgingAndSettingUnderTheLockIsOneStep) {
   constexpr int kEach = 2000;
   const auto count = [&] {
     for (int at = 0; at < kEach; ++at) {
-      const std::lock_guard lock(*map);
+      const RecursiveMutexLock lock(map->mutex());
       const auto held = map->find("a");
       map->set("a", {{"n", held ? held->integer("n") + 1 : 1}});
     }

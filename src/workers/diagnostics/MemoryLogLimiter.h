@@ -2,10 +2,10 @@
 #pragma once
 
 #include <chrono>
-#include <mutex>
 #include <optional>
 
 #include "platform/Clock.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -18,7 +18,7 @@ class MemoryLogLimiter {
   // Whether more than the interval has passed since it was last true, as it is at first. On the monotonic
   // clock.
   bool claim(const Clock& clock) {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     const std::chrono::nanoseconds now = clock.monotonic();
     if (lastCapture_ && now - *lastCapture_ <= kInterval) return false;
     lastCapture_ = now;
@@ -26,8 +26,8 @@ class MemoryLogLimiter {
   }
 
  private:
-  std::mutex mutex_;
-  std::optional<std::chrono::nanoseconds> lastCapture_;  // guarded by mutex_
+  Mutex mutex_;
+  std::optional<std::chrono::nanoseconds> lastCapture_ GUARDED_BY(mutex_);
 };
 
 }  // namespace tonewerk

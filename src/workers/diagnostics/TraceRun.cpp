@@ -11,16 +11,15 @@
 namespace tonewerk {
 
 std::shared_ptr<TraceRun> TraceRun::make(const std::string& probeListPath) {
-  RuntraceConfiguration traceConfig{.probeListPath = probeListPath};
-  traceConfig.compressesFinishedTrace = false;
-  auto run = std::make_shared<TraceRun>();
-  run->traceSession_ = TWReportingContext::current().platform().runtrace.makeSession(traceConfig);
-  run->traceSession_->setDelegate(run);
+  auto run = std::make_shared<TraceRun>(probeListPath);
+  run->traceSession()->setDelegate(run);
   return run;
 }
 
-TraceRun::TraceRun()
-    : mTraceDispatchSemaphore_(TWReportingContext::current().platform().semaphores.makeSemaphore()) {}
+TraceRun::TraceRun(const std::string& probeListPath)
+    : mTraceDispatchSemaphore_(TWReportingContext::current().platform().semaphores.makeSemaphore()),
+      traceSession_(TWReportingContext::current().platform().runtrace.makeSession(
+          {.probeListPath = probeListPath, .compressesFinishedTrace = false})) {}
 
 TraceRun::~TraceRun() = default;
 
@@ -45,7 +44,7 @@ bool TraceRun::stop() {
 }
 
 std::optional<std::string> TraceRun::finalTraceURL() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return finalTraceURL_;
 }
 
@@ -61,7 +60,8 @@ void TraceRun::runtraceDidStart(const RuntraceError& error) {
   } else {
     infoLog(TWReportingTraceCategory(), "Performance Trace Started");
   }
-  if (isFirst(hasStarted_)) mTraceDispatchSemaphore_->signal();
+  // A service that answers twice must not end the wait for something else.
+  if (!hasStarted_.exchange(true)) mTraceDispatchSemaphore_->signal();
 }
 
 // Nobody waits for this: the completion follows.
@@ -81,29 +81,23 @@ void TraceRun::runtraceDidComplete(const std::string& traceLocation, const Runtr
     errorLog(TWReportingTraceCategory(), "runtraceDidComplete %@", *error);
   } else {
     {
-      const std::lock_guard lock(mutex_);
+      const MutexLock lock(mutex_);
       finalTraceURL_ = traceLocation;
       token_ = token;
     }
     infoLog(TWReportingTraceCategory(), "Performance Trace Completed: %@", traceLocation);
   }
-  if (isFirst(hasCompleted_)) mTraceDispatchSemaphore_->signal();
+  if (!hasCompleted_.exchange(true)) mTraceDispatchSemaphore_->signal();
 }
 
 std::shared_ptr<RuntraceSession> TraceRun::traceSession() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return traceSession_;
 }
 
 std::shared_ptr<RuntraceSession> TraceRun::dropTraceSession() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return std::exchange(traceSession_, nullptr);
-}
-
-// A service that says something twice must not end a wait for something else.
-bool TraceRun::isFirst(bool& happened) {
-  const std::lock_guard lock(mutex_);
-  return !std::exchange(happened, true);
 }
 
 }  // namespace tonewerk

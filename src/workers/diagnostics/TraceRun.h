@@ -1,13 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <atomic>
 #include <chrono>
 #include <memory>
-#include <mutex>
 #include <optional>
 #include <string>
 
 #include "platform/Runtrace.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -28,7 +29,7 @@ class TraceRun final : public RuntraceSessionDelegate {
   // Makes the trace session for the probe list.
   static std::shared_ptr<TraceRun> make(const std::string& probeListPath);
 
-  TraceRun();
+  explicit TraceRun(const std::string& probeListPath);
   TraceRun(const TraceRun&) = delete;
   TraceRun& operator=(const TraceRun&) = delete;
   ~TraceRun() override;
@@ -51,15 +52,14 @@ class TraceRun final : public RuntraceSessionDelegate {
  private:
   std::shared_ptr<RuntraceSession> traceSession() const;
   std::shared_ptr<RuntraceSession> dropTraceSession();
-  bool isFirst(bool& happened);
 
   const std::unique_ptr<Semaphore> mTraceDispatchSemaphore_;
-  mutable std::mutex mutex_;  // guards all below
-  std::shared_ptr<RuntraceSession> traceSession_;
-  bool hasStarted_ = false;
-  bool hasCompleted_ = false;
-  std::optional<std::string> finalTraceURL_;
-  RuntraceToken token_;
+  std::atomic<bool> hasStarted_ = false;
+  std::atomic<bool> hasCompleted_ = false;
+  mutable Mutex mutex_;
+  std::shared_ptr<RuntraceSession> traceSession_ GUARDED_BY(mutex_);
+  std::optional<std::string> finalTraceURL_ GUARDED_BY(mutex_);
+  RuntraceToken token_ GUARDED_BY(mutex_);
 };
 
 }  // namespace tonewerk
