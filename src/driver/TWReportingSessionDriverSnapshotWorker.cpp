@@ -1,7 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "driver/TWReportingSessionDriverSnapshotWorker.h"
 
+#include <cassert>
+
+#include "platform/SerialQueue.h"
 #include "session/TWReportingContext.h"
+#include "session/TWReportingUtility.h"
 
 namespace tonewerk {
 
@@ -9,12 +13,14 @@ const TWReportingSessionWorkerClass TWReportingSessionDriverSnapshotWorker::kWor
     workerClassOf<TWReportingSessionDriverSnapshotWorker>("TWReportingSessionDriverSnapshotWorker");
 
 std::optional<bool> TWReportingSessionDriverSnapshotWorker::start() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto& utility = TWReportingContext::current().singles().get<TWReportingDriverUtility>();
   driverSnapShot_ = utility.getSnapShot();
   return true;
 }
 
 void TWReportingSessionDriverSnapshotWorker::stop() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto* utility = TWReportingContext::current().singles().find<TWReportingDriverUtility>();
   if (utility == nullptr) return;  // nothing has started yet in this process
   utility->sendDriverLogsForSession(session.lock().get(), driverSnapShot_ ? &*driverSnapShot_ : nullptr);

@@ -1,12 +1,15 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "monitor/TWReportingSessionSystemMonitorWorker.h"
 
+#include <cassert>
 #include <utility>
 
 #include "monitor/TWReportingSystemMonitor.h"
+#include "platform/SerialQueue.h"
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionMessage.h"
+#include "session/TWReportingUtility.h"
 
 namespace tonewerk {
 namespace {
@@ -26,6 +29,7 @@ TWReportingSessionSystemMonitorWorker::TWReportingSessionSystemMonitorWorker(
 }
 
 std::optional<bool> TWReportingSessionSystemMonitorWorker::start() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   if (systemMonitorDictionary_ == nullptr) return true;
   for (const std::string& key : featureKeys_) {
     observeValueForKeyPath(key);  // what it is now
@@ -36,7 +40,10 @@ std::optional<bool> TWReportingSessionSystemMonitorWorker::start() {
   return true;
 }
 
-void TWReportingSessionSystemMonitorWorker::stop() { observations_.clear(); }
+void TWReportingSessionSystemMonitorWorker::stop() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
+  observations_.clear();
+}
 
 void TWReportingSessionSystemMonitorWorker::observeValueForKeyPath(std::string_view key) {
   const std::optional<ValueMap> state = systemMonitorDictionary_->find(key);
@@ -44,6 +51,7 @@ void TWReportingSessionSystemMonitorWorker::observeValueForKeyPath(std::string_v
 }
 
 void TWReportingSessionSystemMonitorWorker::handleChange(const ValueMap* state) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   ValueMap payload = state == nullptr ? ValueMap() : *state;
   if (const Value* readAt = payload.find(TWReportingInternalEventEpochTime)) {
     payload.set(kLastUpdated, Value(*readAt));  // a copy: setting moves what is in the map

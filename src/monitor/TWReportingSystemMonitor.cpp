@@ -1,12 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "monitor/TWReportingSystemMonitor.h"
 
+#include <cassert>
 #include <cmath>
 #include <utility>
 
 #include "platform/Clock.h"
 #include "platform/Log.h"
 #include "platform/PreferenceStore.h"
+#include "platform/SerialQueue.h"
 #include "platform/SystemInformation.h"
 #include "protocol/FeatureTable.h"
 #include "session/TWReportingContext.h"
@@ -136,6 +138,7 @@ void TWReportingSystemMonitor::listenFor(const std::string& name, const std::str
 }
 
 void TWReportingSystemMonitor::featureChanged(std::string_view name, NotificationService::Token token) {
+  assert(queue_.ownsThisThread());
   infoLog(category(), "feature changes featureName=%@ token=%i", name, token);
   const RecursiveMutexLock lock(systemMonitorDictionary_->mutex());
   std::optional<ValueMap> state = getFeatureState(name);

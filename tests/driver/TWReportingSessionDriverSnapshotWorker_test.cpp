@@ -155,7 +155,8 @@ TEST_F(TWReportingSessionDriverSnapshotWorkerTest, ParallelSessionsShareOneSampl
   EXPECT_EQ(timesSubscribed(), 1U);
 }
 
-TEST_F(TWReportingSessionDriverSnapshotWorkerTest, SessionsThatStartTogetherMakeOneSamplerAndSampleAtOnce) {
+TEST_F(TWReportingSessionDriverSnapshotWorkerTest,
+       ThreadsThatUseTheSamplerFirstMakeOneTogetherAndSampleAtOnce) {
   constexpr std::size_t kSessions = 8;
   std::vector<std::shared_ptr<TWReportingSession>> sessions;
   for (std::size_t i = 0; i < kSessions; ++i)
@@ -163,9 +164,9 @@ TEST_F(TWReportingSessionDriverSnapshotWorkerTest, SessionsThatStartTogetherMake
   std::vector<std::thread> threads;
   for (const auto& owner : sessions) {
     threads.emplace_back([&owner] {
-      TWReportingSessionDriverSnapshotWorker own(owner);
-      own.start();
-      own.stop();
+      const auto& sampler = TWReportingContext::current().singles().get<TWReportingDriverUtility>();
+      const TWReportingDriverUtility::Snapshot snapshot = sampler.getSnapShot();
+      sampler.sendDriverLogsForSession(owner.get(), &snapshot);
     });
   }
   for (std::thread& thread : threads) thread.join();

@@ -1,11 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "workers/diagnostics/TWReportingCapsaWorkerInstanceAlarmLowRMS.h"
 
+#include <cassert>
 #include <string>
 #include <string_view>
 
+#include "platform/SerialQueue.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionMessage.h"
+#include "session/TWReportingUtility.h"
 #include "workers/diagnostics/TWReportingSessionCapsaWorker.h"
 #include "workers/diagnostics/WorkerInstanceState.h"
 
@@ -44,6 +47,7 @@ TWReportingCapsaWorkerInstanceAlarmLowRMS::TWReportingCapsaWorkerInstanceAlarmLo
 
 bool TWReportingCapsaWorkerInstanceAlarmLowRMS::interestedInMessage(
     const TWReportingSessionMessage& message) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   if (message.category != kCategoryError || message.type != kTypeIssueDetector) return false;
   const auto session = session_.lock();
   if (session == nullptr) return false;
@@ -53,6 +57,7 @@ bool TWReportingCapsaWorkerInstanceAlarmLowRMS::interestedInMessage(
 }
 
 void TWReportingCapsaWorkerInstanceAlarmLowRMS::fire(const TWReportingSessionMessage& message) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto session = session_.lock();
   if (session == nullptr) return;
   FaultsignReporter& reporter = *state_->symptomReporter;
@@ -74,6 +79,7 @@ void TWReportingCapsaWorkerInstanceAlarmLowRMS::fire(const TWReportingSessionMes
 
 // Also with the identifier that stands for none: the service knows no such session and says so.
 void TWReportingCapsaWorkerInstanceAlarmLowRMS::stop() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   if (!state_->currentCapsaSessionIdentifier) return;
   const std::string& identifier = *state_->currentCapsaSessionIdentifier;
   infoLog(logSite(), "Stop called. Cancelling Capsa session for alarm Low RMS. sessionId=%@ timeout=%f",

@@ -1,12 +1,15 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "workers/diagnostics/TWReportingCapsaWorkerInstanceHapticLeaks.h"
 
+#include <cassert>
 #include <string>
 #include <string_view>
 
+#include "platform/SerialQueue.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionMessage.h"
+#include "session/TWReportingUtility.h"
 #include "workers/diagnostics/SharedWorkerInstanceStates.h"
 #include "workers/diagnostics/TWReportingSessionCapsaWorker.h"
 
@@ -21,6 +24,7 @@ constexpr std::int64_t kThresholdCount = 2;
 constexpr double kThresholdDurationSeconds = 60.0;
 
 std::shared_ptr<WorkerInstanceState> sharedState() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   auto& states = TWReportingContext::current().singles().get<SharedWorkerInstanceStates>().byClassName;
   auto& state = states[std::string(TWReportingCapsaWorkerInstanceHapticLeaks::kInstanceClass.name)];
   if (state == nullptr) {
@@ -56,10 +60,12 @@ TWReportingCapsaWorkerInstanceHapticLeaks::TWReportingCapsaWorkerInstanceHapticL
 
 bool TWReportingCapsaWorkerInstanceHapticLeaks::interestedInMessage(
     const TWReportingSessionMessage& message) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   return message.type == kTypeEnergybook && message.message.contains(kActiveTimeKey);
 }
 
 void TWReportingCapsaWorkerInstanceHapticLeaks::fire(const TWReportingSessionMessage& message) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto session = session_.lock();
   if (session == nullptr) return;
   FaultsignReporter& reporter = *state_->symptomReporter;

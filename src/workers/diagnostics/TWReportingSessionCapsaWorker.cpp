@@ -2,6 +2,7 @@
 #include "workers/diagnostics/TWReportingSessionCapsaWorker.h"
 
 #include <array>
+#include <cassert>
 #include <cstdint>
 #include <string_view>
 #include <utility>
@@ -9,6 +10,7 @@
 #include "platform/Clock.h"
 #include "platform/DeviceFacts.h"
 #include "platform/Log.h"
+#include "platform/SerialQueue.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionMessage.h"
@@ -62,6 +64,7 @@ const TWReportingSessionWorkerClass TWReportingSessionCapsaWorker::kWorkerClass 
 
 std::shared_ptr<TWReportingSessionCapsaWorker> TWReportingSessionCapsaWorker::initWithSession(
     const std::shared_ptr<TWReportingSession>& session) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   if (!TWReportingUtilityIsInternalBuild()) return nullptr;
   auto worker = std::make_shared<TWReportingSessionCapsaWorker>();
   worker->session = session;
@@ -77,6 +80,7 @@ std::shared_ptr<TWReportingSessionCapsaWorker> TWReportingSessionCapsaWorker::in
 
 void TWReportingSessionCapsaWorker::addInstance(
     const TWReportingSessionCapsaWorkerInstanceClass& instanceClass) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto owner = session.lock();
   if (owner == nullptr) return;
   if (owner->isSingleMessageSession() && !instanceClass.handleSingleMessageSession) return;
@@ -85,17 +89,20 @@ void TWReportingSessionCapsaWorker::addInstance(
 }
 
 std::optional<bool> TWReportingSessionCapsaWorker::start() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   started = true;
   for (const auto& instance : instances_) instance->start();
   return started;
 }
 
 void TWReportingSessionCapsaWorker::stop() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   for (const auto& instance : instances_) instance->stop();
   started = false;
 }
 
 bool TWReportingSessionCapsaWorker::handleMessage(const TWReportingSessionMessage& message) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto owner = session.lock();
   if (owner == nullptr || message.message.empty()) return false;
   for (const auto& instance : instances_) {

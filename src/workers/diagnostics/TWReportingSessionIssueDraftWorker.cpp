@@ -1,12 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "workers/diagnostics/TWReportingSessionIssueDraftWorker.h"
 
+#include <cassert>
 #include <optional>
 #include <string>
 #include <utility>
 
 #include "platform/Clock.h"
 #include "platform/Log.h"
+#include "platform/SerialQueue.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingDefaults.h"
 #include "session/TWReportingSession.h"
@@ -53,6 +55,7 @@ const TWReportingSessionWorkerClass TWReportingSessionIssueDraftWorker::kWorkerC
 
 std::shared_ptr<TWReportingSessionIssueDraftWorker> TWReportingSessionIssueDraftWorker::initWithSession(
     const std::shared_ptr<TWReportingSession>& session) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   if (!TWReportingUtilityIsInternalBuild()) return nullptr;
   const std::optional<Value> backOff = defaults().read(kBackOffSeconds);
   if (!backOff) {
@@ -67,6 +70,7 @@ std::shared_ptr<TWReportingSessionIssueDraftWorker> TWReportingSessionIssueDraft
 }
 
 bool TWReportingSessionIssueDraftWorker::interestedInMessage(const TWReportingSessionMessage& message) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const double time = TWReportingSession::getEpochTimeFromTWReportingStateMessage(message);
   if (minimumMessageTime_ <= 0.0) {
     minimumMessageTime_ = time + kSettlingSeconds;
@@ -78,6 +82,7 @@ bool TWReportingSessionIssueDraftWorker::interestedInMessage(const TWReportingSe
 }
 
 bool TWReportingSessionIssueDraftWorker::handleMessage(const TWReportingSessionMessage& message) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   if (!interestedInMessage(message)) return false;
   if (hasRun_) {
     debugLog(TWReportingSessionCategory(),
@@ -95,11 +100,13 @@ bool TWReportingSessionIssueDraftWorker::handleMessage(const TWReportingSessionM
 }
 
 void TWReportingSessionIssueDraftWorker::stop() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   debugLog(TWReportingSessionCategory(), "Resetting hasRun to false. reporterID=%lli", identifierOf(session));
   hasRun_ = false;
 }
 
 bool TWReportingSessionIssueDraftWorker::hasRunInTimeframe(double seconds, std::string_view defaultsKey) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const double now = TWReportingContext::current().platform().clock.now();
   const std::optional<Value> lastRun = defaults().read(defaultsKey);
   if (lastRun && lastRun->number() > now - seconds) {

@@ -2,6 +2,7 @@
 #include "workers/diagnostics/TWReportingSessionMemoryLogWorker.h"
 
 #include <array>
+#include <cassert>
 #include <future>
 #include <optional>
 #include <string>
@@ -10,6 +11,7 @@
 
 #include "platform/DetachedThreads.h"
 #include "platform/Log.h"
+#include "platform/SerialQueue.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingDefaults.h"
 #include "session/TWReportingSession.h"
@@ -97,6 +99,7 @@ const TWReportingSessionWorkerClass TWReportingSessionMemoryLogWorker::kWorkerCl
 
 std::shared_ptr<TWReportingSessionMemoryLogWorker> TWReportingSessionMemoryLogWorker::initWithSession(
     const std::shared_ptr<TWReportingSession>& session) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   if (session->serviceType() != kServiceTest && !TWReportingUtilityIsInternalBuild()) return nullptr;
   auto worker = std::make_shared<TWReportingSessionMemoryLogWorker>();
   worker->session = session;
@@ -104,6 +107,7 @@ std::shared_ptr<TWReportingSessionMemoryLogWorker> TWReportingSessionMemoryLogWo
 }
 
 bool TWReportingSessionMemoryLogWorker::handleMessage(const TWReportingSessionMessage& message) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   if (message.type != kTypeMemoryLog) return false;
   TWReportingContext& context = TWReportingContext::current();
   if (!context.singles().get<MemoryLogLimiter>().claim(context.platform().clock)) return false;

@@ -1,8 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "workers/diagnostics/TWReportingSessionTraceWorker.h"
 
+#include <cassert>
+
 #include "platform/FileSystem.h"
 #include "platform/Log.h"
+#include "platform/SerialQueue.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingSession.h"
@@ -33,6 +36,7 @@ bool TWReportingSessionTraceWorker::traces(const TWReportingSession& session) {
 }
 
 std::optional<bool> TWReportingSessionTraceWorker::start() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto owner = session.lock();
   if (startedTracing_ || owner == nullptr || !traces(*owner)) return started;
   const ValueMap configuration = owner->configuration();
@@ -53,6 +57,7 @@ std::optional<bool> TWReportingSessionTraceWorker::start() {
 }
 
 void TWReportingSessionTraceWorker::stop() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto owner = session.lock();
   if (owner == nullptr || !startedTracing_ || !traces(*owner)) return;
   startedTracing_ = false;

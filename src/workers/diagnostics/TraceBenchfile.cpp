@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "workers/diagnostics/TraceBenchfile.h"
 
+#include <cassert>
 #include <string_view>
 
 #include "platform/Benchfile.h"
@@ -9,6 +10,7 @@
 #include "platform/JsonService.h"
 #include "platform/Kolvi.h"
 #include "platform/Log.h"
+#include "platform/SerialQueue.h"
 #include "session/LocalTime.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingKeys.h"
@@ -57,6 +59,7 @@ TraceBenchfile::TraceBenchfile(const TWReportingSession& session)
 TraceBenchfile::~TraceBenchfile() = default;
 
 void TraceBenchfile::processTraceKolvi(const std::optional<std::string>& finalTraceURL) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   debugLog(TWReportingTraceCategory(), "Starting Kolvi Process Trace. Path: %@", finalTraceURL);
   if (!finalTraceURL || !platform().files.exists(*finalTraceURL)) {
     errorLog(TWReportingTraceCategory(), "No traceResults at path: %@", finalTraceURL);

@@ -1,10 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "workers/diagnostics/TraceRun.h"
 
+#include <cassert>
 #include <utility>
 
 #include "platform/Log.h"
 #include "platform/Semaphore.h"
+#include "platform/SerialQueue.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingUtility.h"
 
@@ -23,9 +25,13 @@ TraceRun::TraceRun(const std::string& probeListPath)
 
 TraceRun::~TraceRun() = default;
 
-void TraceRun::requestStart() { traceSession()->startRuntrace(); }
+void TraceRun::requestStart() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
+  traceSession()->startRuntrace();
+}
 
 bool TraceRun::waitForStart() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   if (mTraceDispatchSemaphore_->wait(kStartTimeout)) return true;
   errorLog(TWReportingTraceCategory(), "timed out waiting for performance trace to start");
   const auto session = traceSession();
@@ -34,6 +40,7 @@ bool TraceRun::waitForStart() {
 }
 
 bool TraceRun::stop() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto session = traceSession();
   if (session == nullptr) return false;
   session->stopRuntrace();

@@ -37,6 +37,16 @@ class TWReportingSessionMemoryLogWorkerTest : public ReportingTest {
   bool handle(AudioEventType type = kMemoryLog) {
     return worker.handleMessage(TWReportingSessionMessage(ValueMap(), 1, type));
   }
+  // Handles a message as a piece of the work queue, which another thread runs.
+  std::future<bool> handleOnAnotherThread() {
+    SerialQueue& queue = context->reportingServerQueue();
+    return std::async(std::launch::async, [this, &queue] {
+      bool result = true;
+      queue.async([&] { result = handle(); });
+      queue.drain();
+      return result;
+    });
+  }
   // The commands run so far, in no order.
   std::vector<std::string> commands() const {
     std::vector<std::string> commands;
@@ -174,7 +184,7 @@ TEST_F(TWReportingSessionMemoryLogWorkerTest, TheSecondToolStartsFirstEachOnAThr
 TEST_F(TWReportingSessionMemoryLogWorkerTest, BothToolsRunAtOnceAndTheHandlerWaitsForBoth) {
   test.commands.hold("slabtop --once");
   test.commands.hold("tw-memory-usage");
-  auto handled = std::async(std::launch::async, [this] { return handle(); });
+  auto handled = handleOnAnotherThread();
   test.commands.awaitRuns(2);  // neither waited for the other
   test.commands.release("tw-memory-usage");
   EXPECT_THAT(blocks(), IsEmpty());  // the second tool's result comes first
@@ -186,7 +196,7 @@ TEST_F(TWReportingSessionMemoryLogWorkerTest, BothToolsRunAtOnceAndTheHandlerWai
 
 TEST_F(TWReportingSessionMemoryLogWorkerTest, TheLimiterIsFreeWhileTheToolsRun) {
   test.commands.hold("slabtop --once");
-  auto handled = std::async(std::launch::async, [this] { return handle(); });
+  auto handled = handleOnAnotherThread();
   test.commands.awaitRuns(2);
   EXPECT_FALSE(handle());  // would wait for ever at a limiter that is held
   test.commands.release("slabtop --once");
