@@ -21,7 +21,7 @@ class TWReportingSessionDriverSnapshotWorker final : public TWReportingSessionWo
   }
 
   // Takes the snapshot, in place of one that is there. Always true.
-  std::optional<bool> start() override;
+  [[nodiscard]] std::optional<bool> start() override;
   // Sends the session what changed since the snapshot, and drops it. Without a snapshot nothing is sent.
   void stop() override;
 

@@ -65,8 +65,8 @@ class ObservableMap {
   void set(std::string_view key, ValueMap value);
 
   // `map` as the argument, since the observation shares it.
-  static Observation observe(const std::shared_ptr<ObservableMap>& map, std::string_view key,
-                             Observer observer);
+  [[nodiscard]] static Observation observe(const std::shared_ptr<ObservableMap>& map, std::string_view key,
+                                           Observer observer);
   std::size_t observerCount() const;
 
   // What is done while it is held is one step to others.

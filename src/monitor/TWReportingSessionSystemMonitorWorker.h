@@ -26,7 +26,7 @@ class TWReportingSessionSystemMonitorWorker final : public TWReportingSessionWor
   explicit TWReportingSessionSystemMonitorWorker(const std::shared_ptr<TWReportingSession>& owner);
 
   // Always true.
-  std::optional<bool> start() override;
+  [[nodiscard]] std::optional<bool> start() override;
   void stop() override;
 
   // Sends a feature's state; nothing when it is null or empty.

@@ -42,7 +42,7 @@ class TWReportingSystemMonitor : public std::enable_shared_from_this<TWReporting
   // Ends the registrations and drops the monitor. On its queue, or with nothing running there.
   static void reset();
 
-  static std::shared_ptr<TWReportingSystemMonitor> initWithQueue(SerialQueue& queue);
+  [[nodiscard]] static std::shared_ptr<TWReportingSystemMonitor> initWithQueue(SerialQueue& queue);
   TWReportingSystemMonitor(Private, SerialQueue& queue);
   TWReportingSystemMonitor(const TWReportingSystemMonitor&) = delete;
   TWReportingSystemMonitor& operator=(const TWReportingSystemMonitor&) = delete;

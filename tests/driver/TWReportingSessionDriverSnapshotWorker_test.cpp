@@ -61,7 +61,7 @@ TEST_F(TWReportingSessionDriverSnapshotWorkerTest, StartTakesASnapshotAndSaysTha
 }
 
 TEST_F(TWReportingSessionDriverSnapshotWorkerTest, StopSendsWhatChangedSinceStartAndDropsTheSnapshot) {
-  worker.start();
+  EXPECT_EQ(worker.start(), true);
   setVolts(12);
   worker.stop();
   EXPECT_THAT(sentTo(*session), ElementsAre(volts(2)));
@@ -77,7 +77,7 @@ TEST_F(TWReportingSessionDriverSnapshotWorkerTest, StopSendsAtMostThreeMessagesO
         states(speaker("power"), {{"on", 1, static_cast<std::uint64_t>(100 + more), 1}})};
   };
   chanmeter.setRecords(records(0));
-  worker.start();
+  EXPECT_EQ(worker.start(), true);
   chanmeter.setRecords(records(2));
   worker.stop();
   EXPECT_THAT(
@@ -93,9 +93,9 @@ TEST_F(TWReportingSessionDriverSnapshotWorkerTest, StopSendsAtMostThreeMessagesO
 }
 
 TEST_F(TWReportingSessionDriverSnapshotWorkerTest, ASecondStartReplacesTheSnapshot) {
-  worker.start();
+  EXPECT_EQ(worker.start(), true);
   setVolts(15);
-  worker.start();
+  EXPECT_EQ(worker.start(), true);
   EXPECT_EQ(chanmeter.heldSamples(), 1U);
   setVolts(16);
   worker.stop();
@@ -113,7 +113,7 @@ TEST_F(TWReportingSessionDriverSnapshotWorkerTest, StopBeforeAnyStartInTheProces
 TEST_F(TWReportingSessionDriverSnapshotWorkerTest, StopWithoutStartSendsNothingOnceAnotherHasStarted) {
   const auto otherSession = makeSession(78);
   TWReportingSessionDriverSnapshotWorker other(otherSession);
-  other.start();
+  EXPECT_EQ(other.start(), true);
   chanmeter.forgetCalls();
   setVolts(12);
   worker.stop();
@@ -122,7 +122,7 @@ TEST_F(TWReportingSessionDriverSnapshotWorkerTest, StopWithoutStartSendsNothingO
 }
 
 TEST_F(TWReportingSessionDriverSnapshotWorkerTest, ASecondStopSendsNothing) {
-  worker.start();
+  EXPECT_EQ(worker.start(), true);
   setVolts(12);
   worker.stop();
   setVolts(20);
@@ -131,7 +131,7 @@ TEST_F(TWReportingSessionDriverSnapshotWorkerTest, ASecondStopSendsNothing) {
 }
 
 TEST_F(TWReportingSessionDriverSnapshotWorkerTest, StopAfterItsSessionIsGoneDropsTheSnapshot) {
-  worker.start();
+  EXPECT_EQ(worker.start(), true);
   session.reset();
   setVolts(12);
   worker.stop();
@@ -142,9 +142,9 @@ TEST_F(TWReportingSessionDriverSnapshotWorkerTest, StopAfterItsSessionIsGoneDrop
 TEST_F(TWReportingSessionDriverSnapshotWorkerTest, ParallelSessionsShareOneSamplerAndKeepTheirOwnSnapshots) {
   const auto otherSession = makeSession(78);
   TWReportingSessionDriverSnapshotWorker other(otherSession);
-  worker.start();
+  EXPECT_EQ(worker.start(), true);
   setVolts(13);
-  other.start();
+  EXPECT_EQ(other.start(), true);
   EXPECT_EQ(timesSubscribed(), 1U);
   setVolts(20);
   worker.stop();

@@ -17,7 +17,7 @@ class MemoryLogLimiter {
 
   // Whether more than the interval has passed since it was last true, as it is at first. On the monotonic
   // clock.
-  bool claim(const Clock& clock) {
+  [[nodiscard]] bool claim(const Clock& clock) {
     const MutexLock lock(mutex_);
     const std::chrono::nanoseconds now = clock.monotonic();
     if (lastCapture_ && now - *lastCapture_ <= kInterval) return false;

@@ -26,7 +26,7 @@ class MemoryLogTool {
 
   // Runs the tool and gives the lines that are kept; nothing when it could not be started. Blocks. Any
   // thread.
-  std::string capture(CommandRunner& commands) const;
+  [[nodiscard]] std::string capture(CommandRunner& commands) const;
 
   // Of a tool's whole output, what is kept.
   static std::string keptLines(std::string_view output, Filter filter);

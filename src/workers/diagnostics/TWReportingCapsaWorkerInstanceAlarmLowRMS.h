@@ -17,7 +17,7 @@ class TWReportingCapsaWorkerInstanceAlarmLowRMS final : public TWReportingSessio
   static const TWReportingSessionCapsaWorkerInstanceClass kInstanceClass;
   const TWReportingSessionCapsaWorkerInstanceClass& instanceClass() const override { return kInstanceClass; }
 
-  static std::unique_ptr<TWReportingSessionCapsaWorkerInstance> initWithSession(
+  [[nodiscard]] static std::unique_ptr<TWReportingSessionCapsaWorkerInstance> initWithSession(
       const std::shared_ptr<TWReportingSession>& session);
   explicit TWReportingCapsaWorkerInstanceAlarmLowRMS(const std::shared_ptr<TWReportingSession>& session);
 

@@ -14,7 +14,7 @@ class TWReportingCapsaWorkerInstanceHapticLeaks final : public TWReportingSessio
   static const TWReportingSessionCapsaWorkerInstanceClass kInstanceClass;
   const TWReportingSessionCapsaWorkerInstanceClass& instanceClass() const override { return kInstanceClass; }
 
-  static std::unique_ptr<TWReportingSessionCapsaWorkerInstance> initWithSession(
+  [[nodiscard]] static std::unique_ptr<TWReportingSessionCapsaWorkerInstance> initWithSession(
       const std::shared_ptr<TWReportingSession>& session);
   explicit TWReportingCapsaWorkerInstanceHapticLeaks(const std::shared_ptr<TWReportingSession>& session);
 

@@ -16,7 +16,7 @@ class TWReportingCapsaWorkerInstanceVcqDestroyRecordQueue final
   static const TWReportingSessionCapsaWorkerInstanceClass kInstanceClass;
   const TWReportingSessionCapsaWorkerInstanceClass& instanceClass() const override { return kInstanceClass; }
 
-  static std::unique_ptr<TWReportingSessionCapsaWorkerInstance> initWithSession(
+  [[nodiscard]] static std::unique_ptr<TWReportingSessionCapsaWorkerInstance> initWithSession(
       const std::shared_ptr<TWReportingSession>& session);
 
   WorkerInstanceState& workerState() override { return state_; }

@@ -23,7 +23,7 @@ class TWReportingSessionCapsaWorker final : public TWReportingSessionWorkerConsu
   bool handleRedundantMessages() const override { return true; }
 
   // Null on a build that is not internal.
-  static std::shared_ptr<TWReportingSessionCapsaWorker> initWithSession(
+  [[nodiscard]] static std::shared_ptr<TWReportingSessionCapsaWorker> initWithSession(
       const std::shared_ptr<TWReportingSession>& session);
 
   // Adds nothing when the class does not want the session, or the session is of single messages and the class
@@ -31,7 +31,7 @@ class TWReportingSessionCapsaWorker final : public TWReportingSessionWorkerConsu
   void addInstance(const TWReportingSessionCapsaWorkerInstanceClass& instanceClass);
 
   // True.
-  std::optional<bool> start() override;
+  [[nodiscard]] std::optional<bool> start() override;
   // Always false.
   bool handleMessage(const TWReportingSessionMessage& message) override;
   void stop() override;
@@ -41,7 +41,7 @@ class TWReportingSessionCapsaWorker final : public TWReportingSessionWorkerConsu
   }
 
   // The identifier in the service's answer, or "NONE_RETURNED"; logs what the answer says.
-  static std::string getSessionIdentifierFromResponse(const std::optional<ValueMap>& response);
+  [[nodiscard]] static std::string getSessionIdentifierFromResponse(const std::optional<ValueMap>& response);
   // What a capture is about: the session's service, the message's kind, the client's process.
   static FaultsignSignature signatureFromMessage(const TWReportingSessionMessage& message,
                                                  const TWReportingSession& session,

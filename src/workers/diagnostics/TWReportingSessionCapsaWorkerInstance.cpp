@@ -21,7 +21,8 @@ FaultsignReporter::Reply TWReportingSessionCapsaWorkerInstance::replyHandler(
     const std::shared_ptr<WorkerInstanceState>& state, LogReply log) {
   return [gate = TWReportingContext::current().reportingServerQueueGate(), weak = std::weak_ptr(state),
           log = std::move(log)](const std::optional<ValueMap>& response) {
-    gate->run([weak, log, response] {
+    // The gate is closed once the daemon ends, and then nobody needs the answer.
+    (void)gate->run([weak, log, response] {
       const std::string identifier =
           TWReportingSessionCapsaWorker::getSessionIdentifierFromResponse(response);
       if (const auto alive = weak.lock()) alive->currentCapsaSessionIdentifier = identifier;

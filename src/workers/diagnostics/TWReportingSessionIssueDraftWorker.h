@@ -23,11 +23,11 @@ class TWReportingSessionIssueDraftWorker final : public TWReportingSessionWorker
   static constexpr bool handleSingleMessageSession() { return true; }
 
   // None without a back-off period.
-  static std::shared_ptr<TWReportingSessionIssueDraftWorker> initWithSession(
+  [[nodiscard]] static std::shared_ptr<TWReportingSessionIssueDraftWorker> initWithSession(
       const std::shared_ptr<TWReportingSession>& session);
 
   // Whether the message deserves a draft now. Yes is said once a back-off period: who asks has had it.
-  bool interestedInMessage(const TWReportingSessionMessage& message);
+  [[nodiscard]] bool interestedInMessage(const TWReportingSessionMessage& message);
 
   // Always false.
   bool handleMessage(const TWReportingSessionMessage& message) override;
@@ -36,7 +36,7 @@ class TWReportingSessionIssueDraftWorker final : public TWReportingSessionWorker
 
   // Whether the time kept under `defaultsKey` is less than `seconds` ago; if not, it now is. Two sessions
   // that ask one after the other can so never both be told no.
-  bool hasRunInTimeframe(double seconds, std::string_view defaultsKey);
+  [[nodiscard]] bool hasRunInTimeframe(double seconds, std::string_view defaultsKey);
 
   static TrackletDraft trackletDraftForVidroXYerror();
 

@@ -63,7 +63,7 @@ class RunningTool {
     if (result_.valid()) result_.wait();
   }
 
-  std::string result() { return result_.get(); }
+  [[nodiscard]] std::string result() { return result_.get(); }
 
  private:
   std::future<std::string> result_;

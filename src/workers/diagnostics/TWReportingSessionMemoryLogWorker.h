@@ -17,7 +17,7 @@ class TWReportingSessionMemoryLogWorker final : public TWReportingSessionWorkerC
   const TWReportingSessionWorkerClass& workerClass() const override { return kWorkerClass; }
   static constexpr bool startOnInit() { return true; }
 
-  static std::shared_ptr<TWReportingSessionMemoryLogWorker> initWithSession(
+  [[nodiscard]] static std::shared_ptr<TWReportingSessionMemoryLogWorker> initWithSession(
       const std::shared_ptr<TWReportingSession>& session);
 
   bool handleRedundantMessages() const override { return true; }

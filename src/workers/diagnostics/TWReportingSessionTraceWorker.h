@@ -28,7 +28,7 @@ class TWReportingSessionTraceWorker final : public TWReportingSessionWorkerProto
   TWReportingSessionTraceWorker& operator=(const TWReportingSessionTraceWorker&) = delete;
   ~TWReportingSessionTraceWorker() override;
 
-  std::optional<bool> start() override;
+  [[nodiscard]] std::optional<bool> start() override;
   void stop() override;
 
   // "<logs>/Audio/Traces".

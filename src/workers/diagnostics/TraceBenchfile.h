@@ -26,12 +26,12 @@ class TraceBenchfile {
   void processTraceKolvi(const std::optional<std::string>& finalTraceURL);
 
  private:
-  std::optional<ValueArray> readProbeList() const;
+  [[nodiscard]] std::optional<ValueArray> readProbeList() const;
   void createBDWriter();
   std::string generatedFileName() const;
   void processProbe(const KolviProbe& probe, const KolviModel& model);
   // False when what was written is lost.
-  bool closeWriter();
+  [[nodiscard]] bool closeWriter();
   void moveIntoPlace();
 
   const ValueMap configuration_;

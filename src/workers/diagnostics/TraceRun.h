@@ -27,7 +27,7 @@ class TraceRun final : public RuntraceSessionDelegate {
   static constexpr std::chrono::seconds kStopTimeout{180};
 
   // Makes the trace session for the probe list.
-  static std::shared_ptr<TraceRun> make(const std::string& probeListPath);
+  [[nodiscard]] static std::shared_ptr<TraceRun> make(const std::string& probeListPath);
 
   explicit TraceRun(const std::string& probeListPath);
   TraceRun(const TraceRun&) = delete;
@@ -36,9 +36,9 @@ class TraceRun final : public RuntraceSessionDelegate {
 
   void requestStart();
   // True when the service has answered, whatever it said. Otherwise the trace is stopped if it still can be.
-  bool waitForStart();
+  [[nodiscard]] bool waitForStart();
   // True when the trace has completed, well or not; false without a trace session or in time.
-  bool stop();
+  [[nodiscard]] bool stop();
   // Where the completed trace is, for as long as this lives.
   std::optional<std::string> finalTraceURL() const;
   // From its return on the service does not call back any more.

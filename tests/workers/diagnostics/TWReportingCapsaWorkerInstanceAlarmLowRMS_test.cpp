@@ -22,7 +22,7 @@ class TWReportingCapsaWorkerInstanceAlarmLowRMSTest : public CapsaTest {
   void begin(std::shared_ptr<TWReportingSession> newSession) {
     session = std::move(newSession);
     worker = TWReportingSessionCapsaWorker::initWithSession(session);
-    worker->start();
+    EXPECT_EQ(worker->start(), true);
   }
   // A quiet alarm, once more; no two alike.
   void report(const Value& issue = "LowRMS", AudioEventCategory category = kCategoryError,
@@ -101,7 +101,7 @@ TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, NeverFiresASecondTimeInThe
   stayQuiet();
   stayQuiet();
   worker->stop();
-  worker->start();
+  EXPECT_EQ(worker->start(), true);
   stayQuiet();
   EXPECT_THAT(test.capsa.requests(), SizeIs(1));
   EXPECT_EQ(state().firedCount, 1);

@@ -153,7 +153,7 @@ TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest, AnEmptyAnswerLeavesNoneRet
 
 TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest, StoppingCancelsNothing) {
   const auto worker = makeWorker();
-  worker->start();
+  EXPECT_EQ(worker->start(), true);
   leak(*worker);
   test.capsa.answer(0, MemoryCapsa::started("S1"));
   test.queues.runAll();

@@ -135,7 +135,7 @@ TEST_F(TWReportingSessionCapsaWorkerTest, AnInstanceThatDoesNotWantTheSessionIsN
 TEST_F(TWReportingSessionCapsaWorkerTest, TheFirstWorkerMakesTheSharedStates) {
   EXPECT_EQ(context->singles().find<SharedWorkerInstanceStates>(), nullptr);
   test.deviceFacts.set("HapticLeakCapture", false);
-  TWReportingSessionCapsaWorker::initWithSession(session);
+  EXPECT_NE(TWReportingSessionCapsaWorker::initWithSession(session), nullptr);
   const auto* states = context->singles().find<SharedWorkerInstanceStates>();
   ASSERT_NE(states, nullptr);
   EXPECT_THAT(states->byClassName, IsEmpty());

@@ -40,7 +40,7 @@ class TWReportingSessionTraceWorkerTest : public ReportingTest {
   }
 
   void configure(const ValueMap& configuration) {
-    session->updateConfigurationWithContentsOfConfiguration(&configuration);
+    EXPECT_TRUE(session->updateConfigurationWithContentsOfConfiguration(&configuration));
   }
   void useProbes(const std::string& json) { test.files.addFile(kProbes, json); }
 
