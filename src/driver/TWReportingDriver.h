@@ -6,17 +6,18 @@
 
 namespace tonewerk {
 
-// A group of drivers' channels: a group, a subgroup, or both.
+// Names a group of drivers' channels by a group, a subgroup, or both.
 class TWReportingDriver {
  public:
-  // None: every group, every subgroup.
+  // nullopt stands for every group, or for every subgroup.
   static TWReportingDriver driverWithGroupName(std::optional<std::string> groupName,
                                                std::optional<std::string> subGroupName);
 
   const std::optional<std::string>& groupName() const { return groupName_; }
   const std::optional<std::string>& subGroupName() const { return subGroupName_; }
 
-  // "Haptics-Stats"; an absent half is "(null)". The driver's key in a snapshot.
+  // The group and the subgroup, as in "Haptics-Stats". One that is not named is "(null)". A snapshot uses it
+  // as the driver's key.
   std::string description() const;
 
  private:

@@ -19,11 +19,11 @@ namespace tonewerk {
 namespace {
 
 struct DriverNames {
-  const char* group;  // null for all
-  const char* subGroup;
+  const char* group;     // null for every group
+  const char* subGroup;  // null for every subgroup
 };
 
-// In the order in which they are subscribed and sampled.
+// In the order in which they are subscribed to and sampled.
 constexpr std::array<DriverNames, 9> kDrivers{{{"OrvaneAE2MCA", nullptr},
                                                {"Speaker", nullptr},
                                                {nullptr, "MCA"},
@@ -34,11 +34,11 @@ constexpr std::array<DriverNames, 9> kDrivers{{{"OrvaneAE2MCA", nullptr},
                                                {nullptr, "Pellan2"},
                                                {"pdm", nullptr}}};
 
-std::optional<std::string> nameOf(const char* name) {
+std::optional<std::string> optionalName(const char* name) {
   return name == nullptr ? std::nullopt : std::optional<std::string>(name);
 }
 
-// Of samples and of deltas: people look for this line whichever of the two failed.
+// Used for samples and for deltas: people look for this line when either of them fails.
 void logSamplesError(const std::optional<ChanmeterError>& error) {
   if (!error) return;
   errorLog(TWReportingDriverUtilityCategory(), "ChanmeterCreateSamples error %li", error->code);
@@ -70,7 +70,7 @@ void sendStats(TWReportingSession* session, AudioEventType type, ValueMap stats)
 
 }  // namespace
 
-// One map a format.
+// One map for each format.
 struct TWReportingDriverUtility::Stats {
   DriverStatsMap simple;
   DriverStatsMap histograms;
@@ -81,7 +81,8 @@ TWReportingDriverUtility::TWReportingDriverUtility()
     : chanmeter_(TWReportingContext::current().platform().chanmeter) {
   infoLog(TWReportingDriverUtilityCategory(), "creating chanmetering driver utility");
   for (const DriverNames& names : kDrivers) {
-    subscribe(TWReportingDriver::driverWithGroupName(nameOf(names.group), nameOf(names.subGroup)));
+    subscribe(
+        TWReportingDriver::driverWithGroupName(optionalName(names.group), optionalName(names.subGroup)));
   }
 }
 
@@ -100,11 +101,11 @@ void TWReportingDriverUtility::subscribe(const TWReportingDriver& driver) {
     return;
   }
 
-  TWReportingIOChannelSubscription made(driver);
+  TWReportingIOChannelSubscription created(driver);
   error.reset();
-  made.subscription = chanmeter_.createSubscription(channels, made.subscribedChannels, error);
-  if (made.subscription != nullptr && made.subscribedChannels != nullptr) {
-    ioChannelSubscriptions_.push_back(std::move(made));
+  created.subscription = chanmeter_.createSubscription(channels, created.subscribedChannels, error);
+  if (created.subscription != nullptr && created.subscribedChannels != nullptr) {
+    ioChannelSubscriptions_.push_back(std::move(created));
     infoLog(TWReportingDriverUtilityCategory(), "subscribed to group group %@-%@", driver.groupName(),
             driver.subGroupName());
   } else if (error) {
@@ -115,15 +116,16 @@ void TWReportingDriverUtility::subscribe(const TWReportingDriver& driver) {
 
 TWReportingDriverUtility::Snapshot TWReportingDriverUtility::getSnapShot() const {
   Snapshot snapshot;
-  for (const TWReportingIOChannelSubscription& from : ioChannelSubscriptions_) {
-    infoLog(TWReportingDriverUtilityCategory(), "sampling driver %@", from.driver);
+  for (const TWReportingIOChannelSubscription& source : ioChannelSubscriptions_) {
+    infoLog(TWReportingDriverUtilityCategory(), "sampling driver %@", source.driver);
     std::optional<ChanmeterError> error;
-    Chanmeter::Samples samples = chanmeter_.createSamples(from.subscription, from.subscribedChannels, error);
+    Chanmeter::Samples samples =
+        chanmeter_.createSamples(source.subscription, source.subscribedChannels, error);
     if (samples == nullptr) {
       logSamplesError(error);
       continue;
     }
-    snapshot[from.driver.description()] = std::move(samples);
+    snapshot[source.driver.description()] = std::move(samples);
   }
   return snapshot;
 }
@@ -131,26 +133,26 @@ TWReportingDriverUtility::Snapshot TWReportingDriverUtility::getSnapShot() const
 void TWReportingDriverUtility::sendDriverLogsForSession(TWReportingSession* session,
                                                         const Snapshot* driverSnapShot) const {
   Stats stats;
-  for (const TWReportingIOChannelSubscription& from : ioChannelSubscriptions_) {
-    collectChanges(from, driverSnapShot, stats);
+  for (const TWReportingIOChannelSubscription& source : ioChannelSubscriptions_) {
+    collectChanges(source, driverSnapShot, stats);
   }
   sendStats(session, kTypeSimple, std::move(stats.simple));
   sendStats(session, kTypeHistogram, std::move(stats.histograms));
   sendStats(session, kTypeState, std::move(stats.states));
 }
 
-// What it takes is let go of before the next driver's turn.
-void TWReportingDriverUtility::collectChanges(const TWReportingIOChannelSubscription& from,
+// Releases the samples that it takes when it returns, so that it never holds those of two drivers.
+void TWReportingDriverUtility::collectChanges(const TWReportingIOChannelSubscription& source,
                                               const Snapshot* driverSnapShot, Stats& stats) const {
   infoLog(TWReportingDriverUtilityCategory(), "getting latest samples");
   std::optional<ChanmeterError> error;
   const Chanmeter::Samples latest =
-      chanmeter_.createSamples(from.subscription, from.subscribedChannels, error);
+      chanmeter_.createSamples(source.subscription, source.subscribedChannels, error);
   infoLog(TWReportingDriverUtilityCategory(), "done getting latest samples");
   if (latest == nullptr) return logSamplesError(error);
   if (driverSnapShot == nullptr) return;
 
-  const auto earlier = driverSnapShot->find(from.driver.description());
+  const auto earlier = driverSnapShot->find(source.driver.description());
   error.reset();
   const Chanmeter::Samples delta = chanmeter_.createSamplesDelta(
       earlier == driverSnapShot->end() ? nullptr : earlier->second, latest, error);
@@ -192,7 +194,7 @@ void TWReportingDriverUtility::processHistogramData(const ChanmeterSample& sampl
   const std::int32_t count = sample.histogramBucketCount();
   std::int64_t lower = 0;
   std::int64_t upper = 0;
-  // A bucket whose bounds cannot be read has those of the one before it.
+  // A bucket whose bounds cannot be read gets the bounds of the bucket before it.
   std::int64_t bucketLower = 0;
   std::int64_t bucketUpper = 0;
   std::string buckets;

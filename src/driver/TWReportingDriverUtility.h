@@ -16,20 +16,20 @@ namespace tonewerk {
 
 class TWReportingSession;
 
-// Samples the counters of a fixed set of audio and haptic drivers, and reports what changed between two
-// times: counters, histograms and states' residencies, each channel as one entry of a flat map.
+// Samples the channels of a fixed set of audio and haptic drivers and reports what changed between two
+// samples: counters, histograms and the residencies of states. Each channel becomes one entry of a flat map.
 //
-//   TWReportingDriverUtility utility;                      subscribes, once for the process
+//   TWReportingDriverUtility utility;                      subscribes, once in the process
 //   auto before = utility.getSnapShot();                   when a session starts
 //   utility.sendDriverLogsForSession(session, &before);    when it stops
 //
-// Any thread: nothing changes after the constructor. What the channel library refuses is logged with its code
-// and left out; a driver that comes later is not seen.
+// Any thread may use it, because nothing changes after the constructor. When the channel library refuses a
+// request, its error code is logged and that driver is left out. Drivers that appear later are not sampled.
 class TWReportingDriverUtility {
  public:
-  // By driver's description. A driver that could not be sampled is not in it.
+  // Samples by the driver's description. Drivers that could not be sampled have no entry.
   using Snapshot = std::map<std::string, Chanmeter::Samples>;
-  // Composed keys; integers for counters, texts for histograms and states.
+  // Values by composed key: integers for counters, texts for histograms and states.
   using DriverStatsMap = ValueMap;
 
   // Subscribes through the current context's channel library.
@@ -43,30 +43,32 @@ class TWReportingDriverUtility {
 
   Snapshot getSnapShot() const;
 
-  // Sends what changed since `driverSnapShot`: counters, then histograms, then states, each in one message
-  // if there are any. Null for a snapshot: samples are taken, nothing is sent. Null for a session: likewise.
+  // Sends what changed since `driverSnapShot`: one message for counters, then one for histograms, then one
+  // for states, and none for a kind without entries. If either argument is null, it takes samples and sends
+  // nothing.
   void sendDriverLogsForSession(TWReportingSession* session, const Snapshot* driverSnapShot) const;
 
-  // Each adds at most one entry.
+  // Each of the following three adds at most one entry.
   //
-  // A change below 1 adds none.
+  // A change below 1 adds no entry.
   static void processSimpleData(const ChanmeterSample& sample, DriverStatsMap& driverStats);
-  // "count=4,lower=0,upper=30,min=1,max=29,unit=us::10-20:5;20-30:1"; the buckets with hits alone, and no
-  // entry without such. `lower` is never above 0, `upper` never below.
+  // Adds a text like "count=4,lower=0,upper=30,min=1,max=29,unit=us::10-20:5;20-30:1", which lists only the
+  // buckets with hits. Without such a bucket it adds no entry. `lower` is at most 0, `upper` at least 0.
   static void processHistogramData(const ChanmeterSample& sample, DriverStatsMap& driverStats);
-  // "name:on,transition:1,residency:200,duty_cycle:0.500000;" for each state with a residency; an entry also
-  // without such.
+  // Adds a text of one piece like "name:on,transition:1,residency:200,duty_cycle:0.500000;" for each state
+  // with a residency. Without such a state it adds an empty text.
   static void processStateData(const ChanmeterSample& sample, DriverStatsMap& driverStats);
 
-  // "AmpDrv_Speaker_Simple_RailVolts": driver, group, subgroup, type and channel, as far as there are such;
-  // without blanks and underscores of their own, the driver's name up to its first "<".
+  // Joins driver, group, subgroup, type and channel with underscores, as in
+  // "AmpDrv_Speaker_Simple_RailVolts", and leaves out names that the sample does not have. Blanks and
+  // underscores are removed from the names, and the driver's name ends before its first "<".
   static std::string getDriverStatsKey(const ChanmeterSample& sample, std::string_view type);
 
  private:
   struct Stats;
 
   void subscribe(const TWReportingDriver& driver);
-  void collectChanges(const TWReportingIOChannelSubscription& from, const Snapshot* driverSnapShot,
+  void collectChanges(const TWReportingIOChannelSubscription& source, const Snapshot* driverSnapShot,
                       Stats& stats) const;
   static void process(const ChanmeterSample& sample, Stats& stats);
 

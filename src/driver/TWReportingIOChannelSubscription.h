@@ -8,13 +8,14 @@
 
 namespace tonewerk {
 
-// What is subscribed of one driver group; nothing when it is made.
+// Holds the subscription to one driver group's channels. A new one subscribes to nothing.
 struct TWReportingIOChannelSubscription {
-  explicit TWReportingIOChannelSubscription(TWReportingDriver ofDriver) : driver(std::move(ofDriver)) {}
+  explicit TWReportingIOChannelSubscription(TWReportingDriver subscribedDriver)
+      : driver(std::move(subscribedDriver)) {}
 
   TWReportingDriver driver;
   Chanmeter::Subscription subscription;
-  Chanmeter::Channels subscribedChannels;  // may be fewer than the group's
+  Chanmeter::Channels subscribedChannels;  // the group may have more
 };
 
 }  // namespace tonewerk

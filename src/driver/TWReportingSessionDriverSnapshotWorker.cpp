@@ -22,7 +22,7 @@ std::optional<bool> TWReportingSessionDriverSnapshotWorker::start() {
 void TWReportingSessionDriverSnapshotWorker::stop() {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto* utility = TWReportingContext::current().singles().find<TWReportingDriverUtility>();
-  if (utility == nullptr) return;  // nothing has started yet in this process
+  if (utility == nullptr) return;  // no worker of this class has started yet in this process
   utility->sendDriverLogsForSession(session.lock().get(), driverSnapShot_ ? &*driverSnapShot_ : nullptr);
   driverSnapShot_.reset();
 }

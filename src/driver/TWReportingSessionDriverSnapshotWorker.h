@@ -9,8 +9,9 @@
 
 namespace tonewerk {
 
-// Reads the drivers' counters when its session starts and when it stops, and has the session told what
-// changed in between. All sessions share one sampler, which the first start in the process makes.
+// Reads the drivers' channels when its session starts and again when it stops, and sends the session what
+// changed in between. All sessions share one sampler, which the first start in the process makes. Lives on
+// the work queue.
 class TWReportingSessionDriverSnapshotWorker final : public TWReportingSessionWorkerProducerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
@@ -20,12 +21,13 @@ class TWReportingSessionDriverSnapshotWorker final : public TWReportingSessionWo
     session = owner;
   }
 
-  // Takes the snapshot, in place of one that is there. Always true.
+  // Takes the snapshot, which replaces an earlier one. Returns true always.
   [[nodiscard]] std::optional<bool> start() override;
-  // Sends the session what changed since the snapshot, and drops it. Without a snapshot nothing is sent.
+  // Sends the session what changed since the snapshot, then drops the snapshot. Sends nothing without a
+  // snapshot.
   void stop() override;
 
-  // None before start and after stop.
+  // nullopt before start() and after stop().
   const std::optional<TWReportingDriverUtility::Snapshot>& driverSnapShot() const { return driverSnapShot_; }
 
  private:

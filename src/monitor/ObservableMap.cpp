@@ -21,11 +21,11 @@ ObservableMap::Observation::~Observation() { end(); }
 void ObservableMap::Observation::end() {
   const std::shared_ptr<ObservableMap> map = std::move(map_);
   if (map == nullptr) return;
-  Observing ended;  // what the observer holds is let go after the lock
+  Registration removed;  // the observer and what it holds are destroyed after the lock is free
   const RecursiveMutexLock lock(map->mutex_);
   const auto found = map->observers_.find(identifier_);
   if (found == map->observers_.end()) return;
-  ended = std::move(found->second);
+  removed = std::move(found->second);
   map->observers_.erase(found);
 }
 
@@ -38,11 +38,11 @@ std::optional<ValueMap> ObservableMap::find(std::string_view key) const {
 void ObservableMap::set(std::string_view key, ValueMap value) {
   const RecursiveMutexLock lock(mutex_);
   values_.insert_or_assign(std::string(key), std::move(value));
-  wake(key);
+  notify(key);
 }
 
-// By identifier rather than by place, since an observer may end any observation and begin others.
-void ObservableMap::wake(std::string_view key) {
+// Continues by identifier, not by iterator, because an observer may end any observation and add others.
+void ObservableMap::notify(std::string_view key) {
   const std::uint64_t last = lastIdentifier_;
   for (auto next = observers_.begin(); next != observers_.end() && next->first <= last;) {
     const std::uint64_t identifier = next->first;
@@ -58,8 +58,8 @@ ObservableMap::Observation ObservableMap::observe(const std::shared_ptr<Observab
                                                   std::string_view key, Observer observer) {
   const RecursiveMutexLock lock(map->mutex_);
   const std::uint64_t identifier = ++map->lastIdentifier_;
-  map->observers_.emplace(identifier,
-                          Observing{std::string(key), std::make_shared<const Observer>(std::move(observer))});
+  map->observers_.emplace(
+      identifier, Registration{std::string(key), std::make_shared<const Observer>(std::move(observer))});
   return {map, identifier};
 }
 

@@ -14,33 +14,34 @@
 
 namespace tonewerk {
 
-// A map whose observers are woken when a key of theirs is set, before set() returns.
+// Maps keys to values and notifies a key's observers when the key is set, before set() returns.
 //
 //   const auto map = std::make_shared<ObservableMap>();
-//   auto observation = map->observe("ringerstate", [&](std::string_view key) { ... map->find(key) ... });
-//   map->set("ringerstate", state);   // wakes it
-//   observation = {};                 // from here on it is not woken
+//   auto observation = ObservableMap::observe(map, "ringerstate",
+//                                             [&](std::string_view key) { ... map->find(key) ... });
+//   map->set("ringerstate", state);   // notifies it
+//   observation = {};                 // from here on it is not notified
 //
-// Any thread. The lock is held while observers run, so that a set and its observers are one step to everybody
-// else, and whoever holds it may read, judge and set in one step too. It is recursive, because an observer
-// does whatever a message into a session leads to: it may look into the map, set it, and add and end
-// observations, its own included.
+// Any thread may use it. The map's lock is held while observers run, so other threads see a set and its
+// notifications as one step. A caller that holds the lock can also read, decide and set in one step. The lock
+// is recursive, because an observer may send a message into a session, and that may lead to any call here: an
+// observer may read and set the map, and add and end observations, its own included.
 //
-// Why no order of this deadlocks: a thread that holds the map's lock may take any other lock of the daemon,
-// so nobody may wait for the map while holding a lock that observers take. The daemon sets and observes on
-// the work queue alone, which holds none of its own while it runs a piece of work; other threads only ever
-// push work onto it.
+// Why this cannot deadlock: a thread that holds the map's lock may take any other lock of the daemon, so no
+// thread may wait for the map while it holds a lock that observers take. The daemon sets and observes only on
+// the work queue, and the work queue holds no lock of its own while it runs a piece of work. Other threads
+// only push work onto that queue.
 class ObservableMap {
  public:
   using Observer = std::function<void(std::string_view key)>;
 
-  // One observer of one key, until it is destroyed. Keeps the map alive.
+  // Keeps one observer of one key registered until it is destroyed. Keeps the map alive.
   class Observation {
    public:
     Observation() = default;
     Observation(Observation&& other) noexcept;
     Observation& operator=(Observation&& other) noexcept;
-    // The observer is not woken any more, and is not running on another thread, when it returns.
+    // When it returns, the observer is not running on another thread and is not notified again.
     ~Observation();
 
    private:
@@ -57,32 +58,32 @@ class ObservableMap {
   ObservableMap(const ObservableMap&) = delete;
   ObservableMap& operator=(const ObservableMap&) = delete;
 
-  // None when the key was never set.
+  // Returns nullopt when the key was never set.
   std::optional<ValueMap> find(std::string_view key) const;
 
-  // Stores the value and wakes the key's observers, in the order in which they came, whether or not it is
-  // another value than before. One that comes while they are woken is not woken this time.
+  // Stores the value and notifies the key's observers in the order in which they were added, also when the
+  // value is the same as before. An observer that is added meanwhile is not notified of this set.
   void set(std::string_view key, ValueMap value);
 
-  // `map` as the argument, since the observation shares it.
+  // Takes `map` as an argument, because the observation shares its ownership.
   [[nodiscard]] static Observation observe(const std::shared_ptr<ObservableMap>& map, std::string_view key,
                                            Observer observer);
   std::size_t observerCount() const;
 
-  // What is done while it is held is one step to others.
+  // The map's lock. Other threads see everything that is done while it is held as one step.
   RecursiveMutex& mutex() const RETURN_CAPABILITY(mutex_) { return mutex_; }
 
  private:
-  struct Observing {
+  struct Registration {
     std::string key;
-    std::shared_ptr<const Observer> observer;  // shared with a call that is under way
+    std::shared_ptr<const Observer> observer;  // shared with a running call of it
   };
 
-  void wake(std::string_view key) REQUIRES(mutex_);
+  void notify(std::string_view key) REQUIRES(mutex_);
 
   mutable RecursiveMutex mutex_;
   std::map<std::string, ValueMap, std::less<>> values_ GUARDED_BY(mutex_);
-  std::map<std::uint64_t, Observing> observers_ GUARDED_BY(mutex_);  // by identifier, which ascends
+  std::map<std::uint64_t, Registration> observers_ GUARDED_BY(mutex_);  // by identifier; identifiers ascend
   std::uint64_t lastIdentifier_ GUARDED_BY(mutex_) = 0;
 };
 

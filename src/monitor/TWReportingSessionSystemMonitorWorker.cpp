@@ -32,7 +32,7 @@ std::optional<bool> TWReportingSessionSystemMonitorWorker::start() {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   if (systemMonitorDictionary_ == nullptr) return true;
   for (const std::string& key : featureKeys_) {
-    observeValueForKeyPath(key);  // what it is now
+    observeValueForKeyPath(key);  // sends the current state
     observations_.push_back(
         ObservableMap::observe(systemMonitorDictionary_, key,
                                [this](std::string_view changed) { observeValueForKeyPath(changed); }));
@@ -54,8 +54,8 @@ void TWReportingSessionSystemMonitorWorker::handleChange(const ValueMap* state) 
   assert(TWReportingUtilityIsOnReportingServerQueue());
   ValueMap payload = state == nullptr ? ValueMap() : *state;
   if (const Value* readAt = payload.find(TWReportingInternalEventEpochTime)) {
-    payload.set(kLastUpdated, Value(*readAt));  // a copy: setting moves what is in the map
-    // The message gets the times of its own sending.
+    payload.set(kLastUpdated, Value(*readAt));  // a copy, because set() may move the entries of the map
+    // The session adds the time at which the message is sent.
     payload.erase(TWReportingInternalEventEpochTime);
     payload.erase(TWReportingInternalEventSystemUptimeSec);
   }

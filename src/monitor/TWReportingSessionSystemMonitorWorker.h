@@ -12,24 +12,24 @@
 
 namespace tonewerk {
 
-// Tells a session the state of the system's features: each one's when the session starts, and from then on
-// every one that the system monitor stores, as a message of category and type Setup. When the state was read
-// stands in its "last_updated".
+// Sends a session the state of the system's features in messages of category and type Setup: the state of
+// each feature when the session starts, then every state that the system monitor stores. The message's
+// "last_updated" says when the state was read.
 //
-// Messages are sent from inside the monitor's map lock.
+// Lives on the work queue. Messages are sent while the lock of the monitor's map is held.
 class TWReportingSessionSystemMonitorWorker final : public TWReportingSessionWorkerProducerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
   const TWReportingSessionWorkerClass& workerClass() const override { return kWorkerClass; }
 
-  // Takes part in the monitor that there is now. Without one the worker has nothing to do.
+  // Uses the monitor that exists now. Without a monitor the worker does nothing.
   explicit TWReportingSessionSystemMonitorWorker(const std::shared_ptr<TWReportingSession>& owner);
 
-  // Always true.
+  // Returns true always.
   [[nodiscard]] std::optional<bool> start() override;
   void stop() override;
 
-  // Sends a feature's state; nothing when it is null or empty.
+  // Sends a feature's state. Sends nothing when it is null or empty.
   void handleChange(const ValueMap* state);
 
  private:
@@ -37,7 +37,7 @@ class TWReportingSessionSystemMonitorWorker final : public TWReportingSessionWor
 
   const std::shared_ptr<ObservableMap> systemMonitorDictionary_;  // null when there was no monitor
   const std::vector<std::string> featureKeys_;
-  std::vector<ObservableMap::Observation> observations_;  // last: nothing is observed once the rest goes
+  std::vector<ObservableMap::Observation> observations_;  // last, so that they end before the members above
 };
 
 }  // namespace tonewerk

@@ -21,30 +21,30 @@ namespace {
 constexpr std::string_view kDeviceName = "device_name";
 constexpr std::string_view kDisableReporting = "disable_reporting";
 
-// The ringer's state when it is on.
+// The state of the ringer's notification while the ringer is on.
 constexpr std::uint64_t kRingerOn = 1;
 
 const auto category = &TWReportingServiceDelegateCategory;
 
 const Platform& platform() { return TWReportingContext::current().platform(); }
 
-// Where the process keeps its one monitor.
-struct OneMonitor {
-  // Held while the monitor is made or dropped, so that there are never two. Not needed for reading: whoever
-  // reads may hold the map's lock, which making the monitor takes.
-  Mutex making;
-  Mutex reading;  // nothing else is locked under it
-  std::shared_ptr<TWReportingSystemMonitor> monitor GUARDED_BY(reading);
+// Holds the process's monitor.
+struct SharedMonitor {
+  // Held while the monitor is made or dropped, so that there are never two. get() does not take it: its
+  // caller may hold the map's lock, and making a monitor takes that lock.
+  Mutex creationMutex;
+  Mutex monitorMutex;  // no other lock is taken while it is held
+  std::shared_ptr<TWReportingSystemMonitor> monitor GUARDED_BY(monitorMutex);
 
-  static OneMonitor& ofProcess() { return TWReportingContext::current().singles().get<OneMonitor>(); }
+  static SharedMonitor& ofProcess() { return TWReportingContext::current().singles().get<SharedMonitor>(); }
 
   std::shared_ptr<TWReportingSystemMonitor> get() {
-    const MutexLock lock(reading);
+    const MutexLock lock(monitorMutex);
     return monitor;
   }
   std::shared_ptr<TWReportingSystemMonitor> exchange(std::shared_ptr<TWReportingSystemMonitor> other)
-      REQUIRES(making) {
-    const MutexLock lock(reading);
+      REQUIRES(creationMutex) {
+    const MutexLock lock(monitorMutex);
     return std::exchange(monitor, std::move(other));
   }
 };
@@ -58,25 +58,25 @@ std::vector<std::string> namesOf(const ValueMap& features) {
 }  // namespace
 
 void TWReportingSystemMonitor::initializeWithQueue(SerialQueue& queue) {
-  OneMonitor& one = OneMonitor::ofProcess();
-  const MutexLock lock(one.making);
-  if (one.get() == nullptr) one.exchange(initWithQueue(queue));
+  SharedMonitor& shared = SharedMonitor::ofProcess();
+  const MutexLock lock(shared.creationMutex);
+  if (shared.get() == nullptr) shared.exchange(initWithQueue(queue));
 }
 
 std::shared_ptr<ObservableMap> TWReportingSystemMonitor::getSystemMonitorDictionary() {
-  const auto monitor = OneMonitor::ofProcess().get();
+  const auto monitor = SharedMonitor::ofProcess().get();
   return monitor == nullptr ? nullptr : monitor->systemMonitorDictionary_;
 }
 
 std::vector<std::string> TWReportingSystemMonitor::getSystemMonitorKeys() {
-  const auto monitor = OneMonitor::ofProcess().get();
+  const auto monitor = SharedMonitor::ofProcess().get();
   return monitor == nullptr ? std::vector<std::string>() : monitor->featureNames_;
 }
 
 void TWReportingSystemMonitor::reset() {
-  OneMonitor& one = OneMonitor::ofProcess();
-  const MutexLock lock(one.making);
-  if (const auto monitor = one.exchange(nullptr)) monitor->clear();
+  SharedMonitor& shared = SharedMonitor::ofProcess();
+  const MutexLock lock(shared.creationMutex);
+  if (const auto monitor = shared.exchange(nullptr)) monitor->clear();
 }
 
 std::shared_ptr<TWReportingSystemMonitor> TWReportingSystemMonitor::initWithQueue(SerialQueue& queue) {
@@ -116,7 +116,7 @@ void TWReportingSystemMonitor::populateInitialValues() {
 }
 
 void TWReportingSystemMonitor::listenForFeatureStateChanges() {
-  // A handler that runs at once waits here until its token can be found.
+  // A handler that runs before its token is stored waits for this lock.
   const RecursiveMutexLock lock(systemMonitorDictionary_->mutex());
   infoLog(category(), "listening for features %@", features_);
   const ValueMap features = features_;
@@ -128,8 +128,8 @@ void TWReportingSystemMonitor::listenForFeatureStateChanges() {
 
 void TWReportingSystemMonitor::listenFor(const std::string& name, const std::string& notification) {
   const auto [status, token] = notifications_.registerHandler(
-      notification, queue_, [weak = weak_from_this(), name](NotificationService::Token told) {
-        if (const auto monitor = weak.lock()) monitor->featureChanged(name, told);
+      notification, queue_, [weak = weak_from_this(), name](NotificationService::Token notified) {
+        if (const auto monitor = weak.lock()) monitor->featureChanged(name, notified);
       });
   ValueMap descriptor = *descriptorOf(name);
   descriptor.set(kFeatureNotifyToken, token);

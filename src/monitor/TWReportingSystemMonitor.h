@@ -16,30 +16,30 @@ namespace tonewerk {
 
 class SerialQueue;
 
-// Keeps the state of a few features of the system in one shared map, which sessions' workers observe: the
-// spatial-audio accessory feature and the device's name out of the preferences, the ringer switch out of a
-// notification's state. A notification says when to look again.
+// Keeps the state of some features of the system in one shared map, which sessions' workers observe. It reads
+// the spatial-audio accessory feature and the device's name from the preferences, and the ringer switch from
+// a notification's state. A feature's notification makes it read the feature again.
 //
 //   TWReportingSystemMonitor::initializeWithQueue(queue);
 //   const auto map = TWReportingSystemMonitor::getSystemMonitorDictionary();
 //   ... map->find("ringerstate") ...
 //   TWReportingSystemMonitor::reset();   // before the queue ends
 //
-// There is one in the process, kept by TWReportingContext. The static functions may be called from any
-// thread, initializeWithQueue() and reset() not by whoever holds the map's lock.
+// The process has one, which TWReportingContext keeps. Any thread may call the static functions, but a thread
+// that holds the map's lock must not call initializeWithQueue() or reset().
 class TWReportingSystemMonitor : public std::enable_shared_from_this<TWReportingSystemMonitor> {
   struct Private {};
 
  public:
-  // Makes the one monitor, which reads all features and registers for their changes; the handlers run on
-  // `queue`. Does nothing when there is one.
+  // Makes the process's monitor, which reads all features and registers for their notifications. The handlers
+  // run on `queue`. Does nothing when there is a monitor already.
   static void initializeWithQueue(SerialQueue& queue);
-  // The monitor's own map, by feature; null without a monitor. It outlives the monitor, but does not change
-  // any more then.
+  // The monitor's map of features' states by feature name. Null without a monitor. A caller may keep it after
+  // the monitor has ended, but then it does not change any more.
   static std::shared_ptr<ObservableMap> getSystemMonitorDictionary();
-  // The names of all features, in the order of the table; empty without a monitor.
+  // The names of all features in the order of the feature table. Empty without a monitor.
   static std::vector<std::string> getSystemMonitorKeys();
-  // Ends the registrations and drops the monitor. On its queue, or with nothing running there.
+  // Ends the registrations and drops the monitor. Call it on the monitor's queue, or while that runs nothing.
   static void reset();
 
   [[nodiscard]] static std::shared_ptr<TWReportingSystemMonitor> initWithQueue(SerialQueue& queue);
@@ -48,16 +48,16 @@ class TWReportingSystemMonitor : public std::enable_shared_from_this<TWReporting
   TWReportingSystemMonitor& operator=(const TWReportingSystemMonitor&) = delete;
   ~TWReportingSystemMonitor();
 
-  // What the daemon's own preferences say now: "device_name" when it is set, and "disable_reporting", 0 when
-  // it is not.
+  // Reads the daemon's own preferences: "device_name" if it is set, and "disable_reporting", which is 0 if it
+  // is not set.
   static ValueMap TWReportingDefaults();
-  // The same as of the monitor's making.
+  // The same preferences as they were when the monitor was made.
   const ValueMap& getDefaults() const { return defaults_; }
 
   void populateInitialValues();
   void listenForFeatureStateChanges();
-  // Reads a feature: its value under its name, and when it was read. None for what is no feature and for one
-  // without a value.
+  // Reads a feature. The result holds its value under its name, and the times at which it was read. Returns
+  // nullopt when `name` names no feature and when the feature has no value.
   std::optional<ValueMap> getFeatureState(std::string_view name) const;
   // Ends every registration.
   void clear();
@@ -72,8 +72,8 @@ class TWReportingSystemMonitor : public std::enable_shared_from_this<TWReporting
   SerialQueue& queue_;
   NotificationService& notifications_;
   const std::shared_ptr<ObservableMap> systemMonitorDictionary_ = std::make_shared<ObservableMap>();
-  const std::vector<std::string> featureNames_;  // in the order of the table
-  // A descriptor a feature, by its name.
+  const std::vector<std::string> featureNames_;  // in the order of the feature table
+  // One descriptor for each feature, by its name.
   ValueMap features_ GUARDED_BY(systemMonitorDictionary_->mutex());
 };
 

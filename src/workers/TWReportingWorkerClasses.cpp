@@ -20,8 +20,9 @@
 
 namespace tonewerk {
 
-// The JSON file worker is neither producer nor consumer, so it stops after both and finds what they added.
-// The orientation producer is left out on purpose: it cannot be made.
+// The JSON file worker is neither a producer nor a consumer. A session therefore stops it last, and it finds
+// the messages that producers and consumers added. The orientation producer is left out on purpose: it cannot
+// be made.
 std::vector<const TWReportingSessionWorkerClass*> allWorkerClasses() {
   return {
       &TWReportingSessionTraceWorker::kWorkerClass,

@@ -7,7 +7,7 @@
 
 namespace tonewerk {
 
-// Every worker class there is, in the order in which sessions make them.
+// All worker classes, in the order in which a session makes its workers.
 std::vector<const TWReportingSessionWorkerClass*> allWorkerClasses();
 
 }  // namespace tonewerk

@@ -9,14 +9,14 @@
 
 namespace tonewerk {
 
-// Lets one capture of memory logs through every five seconds, for all sessions together. One of the process's
-// single objects. Any thread.
+// Limits captures of memory logs to one every five seconds for all sessions together. The process has one.
+// Any thread may use it.
 class MemoryLogLimiter {
  public:
   static constexpr std::chrono::seconds kInterval{5};
 
-  // Whether more than the interval has passed since it was last true, as it is at first. On the monotonic
-  // clock.
+  // True at the first call, and then whenever more than the interval has passed since it last returned true.
+  // It measures with the monotonic clock.
   [[nodiscard]] bool claim(const Clock& clock) {
     const MutexLock lock(mutex_);
     const std::chrono::nanoseconds now = clock.monotonic();

@@ -9,8 +9,8 @@
 
 namespace tonewerk {
 
-// The states that the instances of all sessions share, by the name of their class. The process has one; the
-// first capture worker makes it. On the work queue.
+// Holds the states that the instances of all sessions share, by the name of the instances' class. The process
+// has one, which the first capture worker makes. Lives on the work queue.
 struct SharedWorkerInstanceStates {
   std::map<std::string, std::shared_ptr<WorkerInstanceState>, std::less<>> byClassName;
 };

@@ -21,7 +21,7 @@ const Value kLowRms("LowRMS");
 constexpr std::int64_t kThresholdCount = 3;
 constexpr double kThresholdDurationSeconds = 15.0;
 
-std::shared_ptr<WorkerInstanceState> ownState() {
+std::shared_ptr<WorkerInstanceState> makeState() {
   auto state = std::make_shared<WorkerInstanceState>();
   state->interestThresholdCount = kThresholdCount;
   state->interestThresholdDurationSeconds = kThresholdDurationSeconds;
@@ -43,7 +43,7 @@ TWReportingCapsaWorkerInstanceAlarmLowRMS::initWithSession(
 
 TWReportingCapsaWorkerInstanceAlarmLowRMS::TWReportingCapsaWorkerInstanceAlarmLowRMS(
     const std::shared_ptr<TWReportingSession>& session)
-    : session_(session), state_(ownState()) {}
+    : session_(session), state_(makeState()) {}
 
 bool TWReportingCapsaWorkerInstanceAlarmLowRMS::interestedInMessage(
     const TWReportingSessionMessage& message) {
@@ -77,7 +77,7 @@ void TWReportingCapsaWorkerInstanceAlarmLowRMS::fire(const TWReportingSessionMes
   }
 }
 
-// Also with the identifier that stands for none: the service knows no such session and says so.
+// Cancels also the identifier that stands for no session: the service does not know it and logs that.
 void TWReportingCapsaWorkerInstanceAlarmLowRMS::stop() {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   if (!state_->currentCapsaSessionIdentifier) return;

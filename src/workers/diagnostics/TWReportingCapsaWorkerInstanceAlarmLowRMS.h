@@ -7,9 +7,9 @@
 
 namespace tonewerk {
 
-// An alarm that can hardly be heard: captures when the session goes on for so long after it was noticed that
-// nobody seems to have heard it. A session that stops before cancels the capture. Not for sessions of single
-// messages.
+// Recognises an alarm that is hardly audible. It has diagnostics captured one minute later, since nobody
+// seems to have heard the alarm if the session still runs then. A session that stops earlier cancels the
+// capture. Single-message sessions do not get this instance.
 class TWReportingCapsaWorkerInstanceAlarmLowRMS final : public TWReportingSessionCapsaWorkerInstance {
  public:
   static constexpr double capsaAlarmLowRmsDuration = 60.0;  // seconds

@@ -35,7 +35,7 @@ std::shared_ptr<WorkerInstanceState> sharedState() {
   return state;
 }
 
-// Whose log lines the capture is to look at.
+// Names the processes whose log lines the capture should contain.
 ValueMap payloadFor(const TWReportingSession& session) {
   ValueArray identifiers;
   for (const std::int32_t identifier : session.processIdentifiers()) identifiers.append(identifier);

@@ -7,8 +7,9 @@
 
 namespace tonewerk {
 
-// Haptics hardware that somebody keeps active: captures at once when messages keep saying so for more than a
-// minute. All sessions of the process count together.
+// Recognises haptics hardware that stays active. It has diagnostics captured at once when messages have
+// reported active hardware for more than a minute. The messages of all sessions in the process are counted
+// together.
 class TWReportingCapsaWorkerInstanceHapticLeaks final : public TWReportingSessionCapsaWorkerInstance {
  public:
   static const TWReportingSessionCapsaWorkerInstanceClass kInstanceClass;

@@ -8,8 +8,8 @@
 
 namespace tonewerk {
 
-// Keeps the place of a symptom that no message shows yet: never interested. Not for sessions of single
-// messages.
+// Stands for a symptom that no message shows yet, so it is never interested in a message. Single-message
+// sessions do not get this instance.
 class TWReportingCapsaWorkerInstanceVcqDestroyRecordQueue final
     : public TWReportingSessionCapsaWorkerInstance {
  public:

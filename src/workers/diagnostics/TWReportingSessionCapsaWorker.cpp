@@ -49,7 +49,7 @@ constexpr std::array<Reason, 10> kReasons{{
 void logReason(std::int64_t error) {
   for (const Reason& reason : kReasons) {
     if (reason.error != error) continue;
-    // A failure without a reason is the service's own.
+    // A failure without a reason is a fault of the service.
     const LogLevel level = error == kFaultsignErrorNone ? LogLevel::kError : LogLevel::kInfo;
     logLine(level, TWReportingCapsaLogCategory(), "Failed starting capsa session. reason=%@", reason.name);
     return;

@@ -12,9 +12,9 @@
 
 namespace tonewerk {
 
-// Watches a session's messages for known symptoms, and has diagnostics captured when one has been seen often
-// enough for long enough. One instance knows one symptom; this owns the session's instances and counts for
-// them. On internal builds only.
+// Watches a session's messages for known symptoms and has diagnostics captured when a symptom has been seen
+// often enough over a long enough time. Each instance recognises one symptom. The worker owns the session's
+// instances and counts for them. It exists on internal builds only and lives on the work queue.
 class TWReportingSessionCapsaWorker final : public TWReportingSessionWorkerConsumerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
@@ -22,17 +22,17 @@ class TWReportingSessionCapsaWorker final : public TWReportingSessionWorkerConsu
   static constexpr bool handleSingleMessageSession() { return true; }
   bool handleRedundantMessages() const override { return true; }
 
-  // Null on a build that is not internal.
+  // Returns null on a build that is not internal.
   [[nodiscard]] static std::shared_ptr<TWReportingSessionCapsaWorker> initWithSession(
       const std::shared_ptr<TWReportingSession>& session);
 
-  // Adds nothing when the class does not want the session, or the session is of single messages and the class
-  // does not do those.
+  // Adds an instance of the class. Adds none when the class does not apply to the session, or when the
+  // session is a single-message session and the class does not handle those.
   void addInstance(const TWReportingSessionCapsaWorkerInstanceClass& instanceClass);
 
-  // True.
+  // Returns true always.
   [[nodiscard]] std::optional<bool> start() override;
-  // Always false.
+  // Returns false always.
   bool handleMessage(const TWReportingSessionMessage& message) override;
   void stop() override;
 
@@ -40,15 +40,16 @@ class TWReportingSessionCapsaWorker final : public TWReportingSessionWorkerConsu
     return instances_;
   }
 
-  // The identifier in the service's answer, or "NONE_RETURNED"; logs what the answer says.
+  // Returns the session identifier in the service's answer, or "NONE_RETURNED". Logs what the answer says.
   [[nodiscard]] static std::string getSessionIdentifierFromResponse(const std::optional<ValueMap>& response);
-  // What a capture is about: the session's service, the message's kind, the client's process.
+  // Describes a capture by the session's service, the message's category and type, and the client's process.
   static FaultsignSignature signatureFromMessage(const TWReportingSessionMessage& message,
                                                  const TWReportingSession& session,
                                                  FaultsignReporter& symptomReporter);
 
  private:
-  // And fires when it is enough. A repeat is one of the last interesting message's payload.
+  // Counts the message and fires when the thresholds are reached. Ignores a message with the same payload as
+  // the last interesting one.
   static void countUnlessRepeated(TWReportingSessionCapsaWorkerInstance& instance,
                                   const TWReportingSessionMessage& message, const TWReportingSession& owner);
   static void fire(TWReportingSessionCapsaWorkerInstance& instance, const TWReportingSessionMessage& message,

@@ -15,13 +15,13 @@ LogSite TWReportingSessionCapsaWorkerInstance::logSite(int line) {
   return {TWReportingCapsaLogCategory(), "TWReportingSessionCapsaWorker", line};
 }
 
-// The state is everybody's on the work queue, so the answer goes there rather than behind a lock. It holds
-// the state weakly: an answer that never comes must not keep it.
+// Everything on the work queue may use the state, so the answer goes there, and the state needs no lock. The
+// handler holds the state weakly: an answer that never comes must not keep it alive.
 FaultsignReporter::Reply TWReportingSessionCapsaWorkerInstance::replyHandler(
     const std::shared_ptr<WorkerInstanceState>& state, LogReply log) {
   return [gate = TWReportingContext::current().reportingServerQueueGate(), weak = std::weak_ptr(state),
           log = std::move(log)](const std::optional<ValueMap>& response) {
-    // The gate is closed once the daemon ends, and then nobody needs the answer.
+    // False once the daemon ends. The answer is not needed then.
     (void)gate->run([weak, log, response] {
       const std::string identifier =
           TWReportingSessionCapsaWorker::getSessionIdentifierFromResponse(response);

@@ -24,7 +24,7 @@ constexpr std::string_view kComponentIdentifier = "VidroComponentIdentifier";
 
 constexpr double kSettlingSeconds = 5.0;
 
-// The bug tracker's own enumerations.
+// Values of the bug tracker's enumerations.
 constexpr std::int32_t kReproducibility = 6;
 constexpr std::int32_t kClassification = 7;
 
@@ -33,8 +33,8 @@ ReporterID identifierOf(const std::weak_ptr<TWReportingSession>& session) {
   return owner == nullptr ? 0 : owner->reporterID();
 }
 
-// Only logs, and with nothing of the daemon's inside: the answer may come after its end. The platform's log
-// outlives both.
+// The handler only logs. It uses nothing that the context owns, because the answer may come after the context
+// has ended. The platform's log outlives both.
 IssueDraftService::CompletionHandler loggingHandler() {
   const LogCategory& own = *TWReportingSessionCategory();
   auto category = std::make_shared<LogCategory>(TWReportingContext::current().platform().log, own.subsystem(),

@@ -27,7 +27,7 @@ constexpr std::size_t kBlockBytes = 512;
 
 using Commands = std::array<std::string, 2>;
 
-// A preference that is no pair of texts is as good as none.
+// The preference if it is an array of two texts, else the default tools.
 Commands toolCommands() {
   TWReportingContext& context = TWReportingContext::current();
   const auto& defaults = context.singles().get<TWReportingDefaults>(context.platform().preferences);
@@ -43,11 +43,11 @@ Commands toolCommands() {
   return {(*texts)[0].asString()->string(), (*texts)[1].asString()->string()};
 }
 
-// A tool at work on a thread of its own. Its end waits for the tool, which uses what the daemon may not take
-// away meanwhile.
+// Runs a tool on a thread of its own. The destructor waits for the tool, because the tool uses objects of the
+// daemon that must not end before it.
 class RunningTool {
  public:
-  // Throws std::system_error when there is no thread for it.
+  // Throws std::system_error when the thread cannot be started.
   RunningTool(std::string_view threadName, MemoryLogTool tool) {
     std::promise<std::string> promise;
     result_ = promise.get_future();
@@ -69,7 +69,7 @@ class RunningTool {
   std::future<std::string> result_;
 };
 
-// The second tool starts first, and its output comes first.
+// The second tool is started first, and its output is logged first.
 void logMemory() {
   Commands commands = toolCommands();
   RunningTool second("twr-memory-1", {std::move(commands[1]), MemoryLogTool::Filter::kNone});
@@ -78,8 +78,8 @@ void logMemory() {
   TWReportingSessionMemoryLogWorker::writeBlocks(first.result());
 }
 
-// Cuts the next block off. `hasLineEnds` becomes false when no line ends behind the block: who writes
-// megabytes without a line's end would otherwise have them searched once for every block.
+// Removes the next block from `text` and returns it. `hasLineEnds` becomes false when no line end follows the
+// block, so that megabytes without a line end are not searched again for each block.
 std::string_view takeBlock(std::string_view& text, bool& hasLineEnds) {
   std::size_t size = text.size();
   if (size >= kBlockBytes) {

@@ -8,9 +8,9 @@
 
 namespace tonewerk {
 
-// Answers a memory-log message with a snapshot of the device's memory in the log: what two tools say of wired
-// and per-process memory and of the kernel's own. At most one every five seconds in the whole process. For
-// test sessions and on internal builds.
+// Logs a snapshot of the device's memory when a memory-log message comes. Two tools report wired and
+// per-process memory, and the kernel's own memory. The whole process logs at most one snapshot every five
+// seconds. The worker exists in test sessions and on internal builds. It lives on the work queue.
 class TWReportingSessionMemoryLogWorker final : public TWReportingSessionWorkerConsumerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
@@ -22,13 +22,14 @@ class TWReportingSessionMemoryLogWorker final : public TWReportingSessionWorkerC
 
   bool handleRedundantMessages() const override { return true; }
 
-  // Always false. Looks at messages of type MemoryLog only. Blocks the work queue until both tools have
-  // ended, which is MemoryLogTool::kLimits.time at the longest: the snapshot is to be that of the message's
-  // moment, and in the log before what comes next.
+  // Handles messages of type MemoryLog only. Returns false always. Blocks the work queue until both tools
+  // have ended, at most for MemoryLogTool::kLimits.time, because the snapshot should show the memory at the
+  // time of the message and stand in the log before the next message's lines.
   bool handleMessage(const TWReportingSessionMessage& message) override;
 
-  // Writes the text to the log in numbered blocks of some 512 bytes that end where a line does, if one does.
-  // A block that the log does not take has no number.
+  // Writes the text to the log in numbered blocks. A block ends with the first line end that follows its
+  // first 512 bytes. Without such a line end it has exactly 512 bytes. The last block may be shorter. A block
+  // that the log does not take gets no number. Any thread may call it.
   static void writeBlocks(std::string_view text);
 };
 

@@ -31,14 +31,14 @@ std::string TWReportingSessionTraceWorker::TWReportingTracingLogsDirectory() {
   return TWReportingContext::current().platform().logsDirectory + "/Audio/Traces";
 }
 
-bool TWReportingSessionTraceWorker::traces(const TWReportingSession& session) {
+bool TWReportingSessionTraceWorker::shouldTrace(const TWReportingSession& session) {
   return session.serviceType() == kServiceTest && TWReportingUtilityIsInternalBuild();
 }
 
 std::optional<bool> TWReportingSessionTraceWorker::start() {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto owner = session.lock();
-  if (startedTracing_ || owner == nullptr || !traces(*owner)) return started;
+  if (startedTracing_ || owner == nullptr || !shouldTrace(*owner)) return started;
   const ValueMap configuration = owner->configuration();
   const Value* probeList = configuration.find(TWReportingKolviPlistFilePath);
   const std::string path = probeList == nullptr ? "" : probeList->text();
@@ -59,12 +59,12 @@ std::optional<bool> TWReportingSessionTraceWorker::start() {
 void TWReportingSessionTraceWorker::stop() {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto owner = session.lock();
-  if (owner == nullptr || !startedTracing_ || !traces(*owner)) return;
+  if (owner == nullptr || !startedTracing_ || !shouldTrace(*owner)) return;
   startedTracing_ = false;
   if (!run_->stop()) return;
   TraceBenchfile(*owner).processTraceKolvi(run_->finalTraceURL());
   run_->abandon();
-  run_.reset();  // and with it the trace, which may be large
+  run_.reset();  // deletes the trace, which may be large
 }
 
 }  // namespace tonewerk

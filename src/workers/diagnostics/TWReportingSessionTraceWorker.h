@@ -11,13 +11,14 @@ namespace tonewerk {
 
 class TraceRun;
 
-// Records a performance trace for the whole life of a test session on internal builds, and makes a benchmark
-// data file of it at stop: how long the intervals of the signposts took that a probe list names.
+// Records a performance trace while a test session is started, on internal builds only. At stop it makes a
+// benchmark data file from the trace. The file says how long the intervals of those signposts took that a
+// probe list names.
 //
 //   idle -> tracing (start() was confirmed within 15 s) -> stopping (at most 180 s) -> file written
 //
-// The session's configuration says what is traced and where the file goes. Both calls block the work queue
-// while they wait, by design: a test waits for its trace.
+// The session's configuration names the probe list and where the file is written. The worker lives on the
+// work queue. start() and stop() block that queue while they wait, by design: a test waits for its trace.
 class TWReportingSessionTraceWorker final : public TWReportingSessionWorkerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
@@ -35,10 +36,10 @@ class TWReportingSessionTraceWorker final : public TWReportingSessionWorkerProto
   static std::string TWReportingTracingLogsDirectory();
 
  private:
-  static bool traces(const TWReportingSession& session);
+  static bool shouldTrace(const TWReportingSession& session);
 
-  bool startedTracing_ = false;    // from a start request until stop(); stays after one that timed out
-  std::shared_ptr<TraceRun> run_;  // the last one, until its trace was processed
+  bool startedTracing_ = false;    // from a start request until stop(), also when the start timed out
+  std::shared_ptr<TraceRun> run_;  // the last run, until its trace has been processed
 };
 
 }  // namespace tonewerk

@@ -82,7 +82,7 @@ void TraceBenchfile::processTraceKolvi(const std::optional<std::string>& finalTr
   if (closeWriter()) moveIntoPlace();
 }
 
-// None when it cannot be read or holds no list.
+// Returns nullopt when the probe list cannot be read or holds no list.
 std::optional<ValueArray> TraceBenchfile::readProbeList() const {
   std::string text;
   if (platform().files.readFile(configuration_.text(TWReportingKolviPlistFilePath), text)) {

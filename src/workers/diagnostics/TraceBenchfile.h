@@ -14,8 +14,8 @@ class KolviModel;
 class TWReportingSession;
 struct KolviProbe;
 
-// Makes a benchmark data file of a finished trace, for one session. On the work queue. Every failure is
-// logged and ends what cannot go on.
+// Makes a benchmark data file from a session's finished trace. Lives on the work queue. Failures are logged.
+// After a failure it does the remaining steps that are still possible.
 class TraceBenchfile {
  public:
   explicit TraceBenchfile(const TWReportingSession& session);
@@ -30,7 +30,7 @@ class TraceBenchfile {
   void createBDWriter();
   std::string generatedFileName() const;
   void processProbe(const KolviProbe& probe, const KolviModel& model);
-  // False when what was written is lost.
+  // Returns false when the values that were written are lost.
   [[nodiscard]] bool closeWriter();
   void moveIntoPlace();
 

@@ -55,7 +55,8 @@ std::optional<std::string> TraceRun::finalTraceURL() const {
   return finalTraceURL_;
 }
 
-// Without the lock, which a callback that is waited for may want.
+// Calls setDelegate() without the lock: setDelegate() waits for a running callback, and a callback may take
+// the lock.
 void TraceRun::abandon() {
   if (const auto session = dropTraceSession()) session->setDelegate({});
 }
@@ -67,11 +68,11 @@ void TraceRun::runtraceDidStart(const RuntraceError& error) {
   } else {
     infoLog(TWReportingTraceCategory(), "Performance Trace Started");
   }
-  // A service that answers twice must not end the wait for something else.
+  // Signals once, because a second answer would end the next wait too early.
   if (!hasStarted_.exchange(true)) mTraceDispatchSemaphore_->signal();
 }
 
-// Nobody waits for this: the completion follows.
+// Does not signal, because stop() waits for the completion that follows.
 void TraceRun::runtraceDidStop(const RuntraceError& error) {
   if (error) {
     static_cast<void>(dropTraceSession());

@@ -14,13 +14,13 @@ namespace tonewerk {
 
 class Semaphore;
 
-// One performance trace of a trace worker's, from the request to start it to its completion.
+// Runs one performance trace for a trace worker, from the request to start it to its completion.
 //
 //   make() -> requestStart() -> waitForStart() -> ... -> stop() -> finalTraceURL()
 //
-// The worker calls from the work queue, which the waits block; the callbacks come from the trace service's
-// threads, and only set what the lock guards and signal. Each start has a run of its own, so what an earlier
-// one is told too late does not touch it.
+// The worker uses it on the work queue, which waitForStart() and stop() block. The callbacks come on the
+// trace service's threads; they only store results and signal. Each start makes a run of its own, so a late
+// callback of an earlier run does not change it.
 class TraceRun final : public RuntraceSessionDelegate {
  public:
   static constexpr std::chrono::seconds kStartTimeout{15};
@@ -35,13 +35,15 @@ class TraceRun final : public RuntraceSessionDelegate {
   ~TraceRun() override;
 
   void requestStart();
-  // True when the service has answered, whatever it said. Otherwise the trace is stopped if it still can be.
+  // True when the service has answered, also with an error. After a timeout it returns false and stops the
+  // trace if the trace is still valid.
   [[nodiscard]] bool waitForStart();
-  // True when the trace has completed, well or not; false without a trace session or in time.
+  // Stops the trace and waits for its completion. True when the trace has completed, also with an error.
+  // False without a trace session and after a timeout.
   [[nodiscard]] bool stop();
-  // Where the completed trace is, for as long as this lives.
+  // The path of the completed trace, which exists as long as this object. nullopt without one.
   std::optional<std::string> finalTraceURL() const;
-  // From its return on the service does not call back any more.
+  // When it returns, the service does not call back any more. Any thread may call it.
   void abandon();
 
   void runtraceDidStart(const RuntraceError& error) override;

@@ -13,23 +13,24 @@
 
 namespace tonewerk {
 
-// How often a capture worker's instance has seen its symptom, and what came of it. As it is made an instance
-// never fires: no time is longer than its threshold. On the work queue.
+// Records how often an instance of the capture worker has seen its symptom and what was captured. With the
+// initial thresholds an instance never fires, because no time exceeds its threshold. Lives on the work queue.
 struct WorkerInstanceState {
-  // What the service called the last capture; none as long as it has not answered.
+  // The session identifier from the service's latest answer, or "NONE_RETURNED". nullopt before the first
+  // answer.
   std::optional<std::string> currentCapsaSessionIdentifier;
 
   std::int64_t interestedCount = 0;
-  std::int64_t interestThresholdCount = -1;  // reached when the count is as high
+  std::int64_t interestThresholdCount = -1;  // reached when the count is at least this
   std::optional<Date> interestFirstSeen;
-  double interestThresholdDurationSeconds = std::numeric_limits<double>::max();  // to be exceeded
+  double interestThresholdDurationSeconds = std::numeric_limits<double>::max();  // must be exceeded
 
   bool oncePerSession = false;
   std::int64_t firedCount = 0;
-  // Of the payload of the last interesting message since the counting began. A digest, since a client may
-  // have thousands of sessions and payloads of any size.
+  // The digest of the last interesting message's payload since the counting began. Only a digest is kept,
+  // because a client may have thousands of sessions and payloads of any size.
   std::optional<ValueDigest> lastMessage;
-  // The one that the last firing used.
+  // The reporter that was made for the last firing.
   std::unique_ptr<FaultsignReporter> symptomReporter;
 };
 
