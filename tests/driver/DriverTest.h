@@ -10,13 +10,14 @@
 
 namespace tonewerk {
 
-// What a test of the sampler starts from: channels that it sets, a session that keeps what it is sent.
+// Base of the sampler's tests: gives access to the channels that a test sets and to the messages that a
+// session got.
 class DriverTest : public ReportingTest {
  protected:
   using Operation = MemoryChanmeter::Operation;
   using Group = MemoryChanmeter::Group;
 
-  // A message that a session was sent, without what the session adds to every one.
+  // A message that was sent to a session, without the entries that the session adds to every message.
   struct Sent {
     AudioEventCategory category;
     AudioEventType type;

@@ -5,7 +5,7 @@
 #include "driver/DriverTest.h"
 #include "platform/chanmeter/ChanmeterRecordSample.h"
 
-// How one channel becomes one entry.
+// These tests show how one channel becomes one entry.
 
 namespace tonewerk {
 namespace {
@@ -23,7 +23,7 @@ std::string keyOf(const ChanmeterKey& key, std::string_view type = "Simple") {
   return TWReportingDriverUtility::getDriverStatsKey(sampleOf({.key = key}), type);
 }
 
-// Logs go to the sampler's category.
+// Needs the fixture because the functions log in the sampler's category.
 class TWReportingDriverUtilityFormatsTest : public DriverTest {
  protected:
   static DriverStatsMap simpleOf(std::int64_t value) {
@@ -54,7 +54,7 @@ TEST_F(TWReportingDriverUtilityFormatsTest, AKeyIsDriverGroupTypeAndChannel) {
             "AmpDrv_Speaker_Simple_RailVolts");
 }
 
-TEST_F(TWReportingDriverUtilityFormatsTest, AKeyWithEveryPartHasTheSubGroupBehindTheGroup) {
+TEST_F(TWReportingDriverUtilityFormatsTest, AKeyWithEveryPartHasTheSubGroupAfterTheGroup) {
   EXPECT_EQ(keyOf({.driver = "d", .group = "g", .subGroup = "s", .name = "n"}, "State"), "d_g_s_State_n");
 }
 
@@ -63,14 +63,14 @@ TEST_F(TWReportingDriverUtilityFormatsTest, AKeyOfAChannelWithoutNamesIsTheTypeA
   EXPECT_EQ(keyOf({}, "Histogram"), "Histogram_");
 }
 
-TEST_F(TWReportingDriverUtilityFormatsTest, EachAbsentPartTakesItsUnderscoreWithIt) {
+TEST_F(TWReportingDriverUtilityFormatsTest, AnAbsentPartHasNoUnderscoreEither) {
   EXPECT_EQ(keyOf({.group = "g", .subGroup = "s", .name = "n"}), "g_s_Simple_n");
   EXPECT_EQ(keyOf({.driver = "d", .subGroup = "s", .name = "n"}), "d_s_Simple_n");
   EXPECT_EQ(keyOf({.driver = "d", .group = "g", .name = "n"}), "d_g_Simple_n");
   EXPECT_EQ(keyOf({.driver = "d", .group = "g", .subGroup = "s"}), "d_g_s_Simple_");
 }
 
-TEST_F(TWReportingDriverUtilityFormatsTest, APartThatIsThereButEmptyKeepsItsUnderscore) {
+TEST_F(TWReportingDriverUtilityFormatsTest, AnEmptyPartKeepsItsUnderscore) {
   EXPECT_EQ(keyOf({.driver = "", .group = "", .subGroup = "", .name = ""}), "___Simple_");
 }
 
@@ -93,7 +93,7 @@ TEST_F(TWReportingDriverUtilityFormatsTest, ADriversNameEndsAtItsFirstAngleBrack
   EXPECT_EQ(keyOf({.driver = "<1>", .name = "n"}), "_Simple_n");
 }
 
-TEST_F(TWReportingDriverUtilityFormatsTest, ADriversNameWithoutAngleBracketIsTakenWhole) {
+TEST_F(TWReportingDriverUtilityFormatsTest, ADriversNameWithoutOpeningAngleBracketIsKeptWhole) {
   EXPECT_EQ(keyOf({.driver = "Amp>1", .name = "n"}), "Amp>1_Simple_n");
 }
 
@@ -115,7 +115,7 @@ TEST_F(TWReportingDriverUtilityFormatsTest, ASimpleChannelThatWentUpAddsItsChang
   EXPECT_EQ(most.integer("Amp_Speaker_Simple_a"), kMax);
 }
 
-TEST_F(TWReportingDriverUtilityFormatsTest, AHistogramSaysHowManyBucketsThereAreAndThoseWithHits) {
+TEST_F(TWReportingDriverUtilityFormatsTest, AHistogramGivesTheNumberOfBucketsAndListsThoseWithHits) {
   ChanmeterRecord record =
       histogram(speaker("Queue Delay"), {{0, 10, 0}, {10, 20, 5}, {20, 30, 1}, {30, 40, 0}});
   record.minimum = 11;
@@ -136,7 +136,7 @@ TEST_F(TWReportingDriverUtilityFormatsTest, AHistogramWithoutHitsAddsNothing) {
   EXPECT_THAT(histogramOf(histogram(speaker("a"), {})), IsEmpty());
 }
 
-TEST_F(TWReportingDriverUtilityFormatsTest, HitsBelowZeroAreHits) {
+TEST_F(TWReportingDriverUtilityFormatsTest, NegativeHitsCountAsHits) {
   EXPECT_EQ(bucketsText({{0, 10, -2}}), "count=1,lower=0,upper=10,min=0,max=0,unit=(null)::0-10:-2");
 }
 
@@ -150,7 +150,7 @@ TEST_F(TWReportingDriverUtilityFormatsTest, BoundsThatAreAllNegativeStillReportU
             "count=2,lower=-20,upper=0,min=0,max=0,unit=(null)::-20--10:1");
 }
 
-TEST_F(TWReportingDriverUtilityFormatsTest, NumbersAreWholeInAllTheirWidth) {
+TEST_F(TWReportingDriverUtilityFormatsTest, NumbersKeepAll64Bits) {
   constexpr std::int64_t kLeast = std::numeric_limits<std::int64_t>::min();
   constexpr std::int64_t kMax = std::numeric_limits<std::int64_t>::max();
   ChanmeterRecord record = histogram(speaker("a"), {{kLeast, kMax, kMax}});
@@ -162,19 +162,19 @@ TEST_F(TWReportingDriverUtilityFormatsTest, NumbersAreWholeInAllTheirWidth) {
       "max=9223372036854775807,unit=(null)::-9223372036854775808-9223372036854775807:9223372036854775807");
 }
 
-TEST_F(TWReportingDriverUtilityFormatsTest, ABucketWhoseBoundsCannotBeReadHasThoseOfTheOneBefore) {
+TEST_F(TWReportingDriverUtilityFormatsTest, ABucketWithUnreadableBoundsHasThoseOfTheBucketBeforeIt) {
   EXPECT_EQ(bucketsText({{10, 20, 1}, {{}, {}, 2}, {{}, 90, 3}, {30, 40, 0}}),
             "count=4,lower=0,upper=40,min=0,max=0,unit=(null)::10-20:1;10-20:2;10-20:3");
   EXPECT_THAT(logged(LogLevel::kInfo), ElementsAre("Error in getting the bucket bounds : 1",
                                                    "Error in getting the bucket bounds : 1"));
 }
 
-TEST_F(TWReportingDriverUtilityFormatsTest, AFirstBucketWhoseBoundsCannotBeReadHasZeros) {
+TEST_F(TWReportingDriverUtilityFormatsTest, AFirstBucketWithUnreadableBoundsHasZeros) {
   EXPECT_EQ(bucketsText({{{}, {}, 2}, {10, 20, 1}}),
             "count=2,lower=0,upper=20,min=0,max=0,unit=(null)::0-0:2;10-20:1");
 }
 
-TEST_F(TWReportingDriverUtilityFormatsTest, BoundsAreLoggedAsUnreadableAlsoWithoutHits) {
+TEST_F(TWReportingDriverUtilityFormatsTest, UnreadableBoundsAreLoggedAlsoWithoutHits) {
   EXPECT_THAT(histogramOf(histogram(speaker("a"), {{{}, {}, 0}})), IsEmpty());
   EXPECT_THAT(logged(LogLevel::kInfo), ElementsAre("Error in getting the bucket bounds : 1"));
 }
@@ -207,7 +207,7 @@ TEST_F(TWReportingDriverUtilityFormatsTest, AStatesTextIsLogged) {
                   "the current reported data is : "));
 }
 
-TEST_F(TWReportingDriverUtilityFormatsTest, ChannelsThatShareAKeyLeaveTheLastOne) {
+TEST_F(TWReportingDriverUtilityFormatsTest, OfChannelsThatShareAKeyTheLastOneIsKept) {
   DriverStatsMap stats;
   TWReportingDriverUtility::processSimpleData(sampleOf(simple(speaker("a b"), 1)), stats);
   TWReportingDriverUtility::processSimpleData(sampleOf(simple(speaker("a_b"), 2)), stats);

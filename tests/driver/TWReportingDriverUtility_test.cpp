@@ -27,7 +27,7 @@ class TWReportingDriverUtilityTest : public DriverTest {
     chanmeter.setRecords({simple(speaker("volts"), 10), simple(keyIn("Tx", "frames"), 100)});
   }
 
-  // A channel in each of the nine groups; two of them are in a group of the driver's own.
+  // One channel for each of the nine subscriptions. Two of them are found by their subgroup only.
   static std::vector<ChanmeterRecord> oneOfEach(std::int64_t value) {
     std::vector<ChanmeterRecord> records;
     for (const char* group : {"OrvaneAE2MCA", "Speaker", "StateTransitionTimes_ms", "Rx", "Tx", "pdm"}) {
@@ -41,7 +41,7 @@ class TWReportingDriverUtilityTest : public DriverTest {
     return records;
   }
 
-  // What a report sends when the channels become `later` after the snapshot.
+  // Returns what a report sends when the channels change to `later` after the snapshot.
   std::vector<Sent> report(const std::vector<ChanmeterRecord>& later) {
     const TWReportingDriverUtility utility;
     const auto snapshot = utility.getSnapShot();
@@ -59,9 +59,9 @@ class TWReportingDriverUtilityTest : public DriverTest {
   }
 };
 
-// Subscribing.
+// Subscribing to channels.
 
-TEST_F(TWReportingDriverUtilityTest, SubscribesNineDriversInTheirOrder) {
+TEST_F(TWReportingDriverUtilityTest, SubscribesToNineDriversInOrder) {
   chanmeter.setRecords(oneOfEach(1));
   const TWReportingDriverUtility utility;
   EXPECT_THAT(descriptionsOf(utility), ElementsAre("OrvaneAE2MCA-(null)", "Speaker-(null)", "(null)-MCA",
@@ -73,7 +73,7 @@ TEST_F(TWReportingDriverUtilityTest, SubscribesNineDriversInTheirOrder) {
   }
 }
 
-TEST_F(TWReportingDriverUtilityTest, SaysWhatItSubscribedAndWhereThereWereNoChannels) {
+TEST_F(TWReportingDriverUtilityTest, LogsItsSubscriptionsAndTheGroupsWithoutChannels) {
   const TWReportingDriverUtility utility;
   EXPECT_THAT(logged(LogLevel::kInfo),
               ElementsAre("creating chanmetering driver utility",
@@ -90,12 +90,12 @@ TEST_F(TWReportingDriverUtilityTest, SaysWhatItSubscribedAndWhereThereWereNoChan
   EXPECT_THAT(test.log.linesOf("twrd").front().message, StartsWith(" TWReportingDriverUtility:"));
 }
 
-TEST_F(TWReportingDriverUtilityTest, AnEmptyGroupIsNotSubscribed) {
+TEST_F(TWReportingDriverUtilityTest, AnEmptyGroupIsNotSubscribedTo) {
   const TWReportingDriverUtility utility;
   EXPECT_THAT(chanmeter.calls(), Not(Contains("createSubscription Rx-(null)")));
 }
 
-TEST_F(TWReportingDriverUtilityTest, ADriverWhoseChannelsCannotBeHadIsLoggedAndLeftOut) {
+TEST_F(TWReportingDriverUtilityTest, ADriverWhoseChannelsCannotBeCopiedIsLoggedAndLeftOut) {
   chanmeter.fail(Operation::kCopyChannels, {.code = -536870206}, kSpeaker);
   const TWReportingDriverUtility utility;
   EXPECT_THAT(descriptionsOf(utility), ElementsAre("Tx-(null)"));
@@ -119,7 +119,7 @@ TEST_F(TWReportingDriverUtilityTest, AnErrorThatComesWithAChannelSetIsLoggedAndT
   EXPECT_THAT(logged(LogLevel::kError), ElementsAre("error 7 getting channels for driver Speaker-(null)"));
 }
 
-TEST_F(TWReportingDriverUtilityTest, AnErrorThatCameWithAChannelSetIsNotTakenForTheSubscriptions) {
+TEST_F(TWReportingDriverUtilityTest, AnErrorThatComesWithAChannelSetIsNotLoggedAsTheSubscriptions) {
   chanmeter.fail(Operation::kCopyChannels, {.code = 7, .resultComes = true}, kSpeaker);
   chanmeter.fail(Operation::kCreateSubscription, {}, kSpeaker);
   const TWReportingDriverUtility utility;
@@ -176,13 +176,13 @@ TEST_F(TWReportingDriverUtilityTest, WhenAllNineFailTheListIsEmptyAndEachIsLogge
               AllOf(SizeIs(9), Each(StartsWith("error 1 getting channels for driver "))));
 }
 
-TEST_F(TWReportingDriverUtilityTest, ADriverThatComesLaterIsNotSeen) {
+TEST_F(TWReportingDriverUtilityTest, ADriverThatAppearsLaterIsNotSampled) {
   const TWReportingDriverUtility utility;
   chanmeter.setRecords(oneOfEach(1));
   EXPECT_THAT(utility.getSnapShot(), SizeIs(2));
 }
 
-// The snapshot.
+// Taking the snapshot.
 
 TEST_F(TWReportingDriverUtilityTest, ASnapshotHoldsEachDriversSamplesUnderItsDescription) {
   const TWReportingDriverUtility utility;
@@ -206,7 +206,7 @@ TEST_F(TWReportingDriverUtilityTest, ADriverThatCannotBeSampledIsLoggedAndNotInT
   EXPECT_THAT(logged(LogLevel::kError), ElementsAre("ChanmeterCreateSamples error 5"));
 }
 
-TEST_F(TWReportingDriverUtilityTest, SamplesThatDoNotComeWithoutErrorAreLeftOutSilently) {
+TEST_F(TWReportingDriverUtilityTest, MissingSamplesWithoutAnErrorAreLeftOutSilently) {
   const TWReportingDriverUtility utility;
   chanmeter.fail(Operation::kCreateSamples, {}, kSpeaker);
   EXPECT_THAT(utility.getSnapShot(), SizeIs(1));
@@ -229,7 +229,7 @@ TEST_F(TWReportingDriverUtilityTest, SamplesLiveAsLongAsTheirSnapshot) {
   EXPECT_EQ(chanmeter.heldSamples(), 0U);
 }
 
-// The report.
+// Sending the report.
 
 TEST_F(TWReportingDriverUtilityTest, AReportSendsWhatChangedSinceTheSnapshot) {
   EXPECT_THAT(
@@ -240,7 +240,7 @@ TEST_F(TWReportingDriverUtilityTest, AReportSendsWhatChangedSinceTheSnapshot) {
   EXPECT_THAT(logged(LogLevel::kError), IsEmpty());
 }
 
-TEST_F(TWReportingDriverUtilityTest, AReportTakesInAllNineDrivers) {
+TEST_F(TWReportingDriverUtilityTest, AReportCoversAllNineDrivers) {
   chanmeter.setRecords(oneOfEach(1));
   EXPECT_THAT(report(oneOfEach(3)), ElementsAre(Sent{kChanmetering,
                                                      16,
@@ -273,7 +273,7 @@ TEST_F(TWReportingDriverUtilityTest, AReportSendsSimpleHistogramAndStateInThisOr
                        {{"Amp_Speaker_State_s", "name:on,transition:0,residency:7,duty_cycle:1.000000;"}}}));
 }
 
-TEST_F(TWReportingDriverUtilityTest, MapsThatStayEmptyAreNotSent) {
+TEST_F(TWReportingDriverUtilityTest, EmptyMapsAreNotSent) {
   const std::vector<ChanmeterRecord> records = {simple(speaker("v"), 5),
                                                 histogram(speaker("h"), {{0, 10, 5}})};
   chanmeter.setRecords(records);
@@ -298,7 +298,7 @@ TEST_F(TWReportingDriverUtilityTest, AReportWithoutSnapshotSendsNothingButTakesA
   EXPECT_THAT(logged(LogLevel::kError), IsEmpty());
 }
 
-TEST_F(TWReportingDriverUtilityTest, AReportForASessionThatIsGoneSendsNothing) {
+TEST_F(TWReportingDriverUtilityTest, AReportWithoutASessionSendsNothing) {
   const TWReportingDriverUtility utility;
   const auto snapshot = utility.getSnapShot();
   chanmeter.setRecords({simple(speaker("volts"), 12)});
@@ -306,7 +306,7 @@ TEST_F(TWReportingDriverUtilityTest, AReportForASessionThatIsGoneSendsNothing) {
   EXPECT_EQ(chanmeter.heldSamples(), 2U) << "the snapshot's own";
 }
 
-TEST_F(TWReportingDriverUtilityTest, AReportLeavesTheSnapshotAsItWas) {
+TEST_F(TWReportingDriverUtilityTest, AReportDoesNotChangeTheSnapshot) {
   const TWReportingDriverUtility utility;
   const auto snapshot = utility.getSnapShot();
   chanmeter.setRecords({simple(speaker("volts"), 12)});
@@ -327,7 +327,7 @@ TEST_F(TWReportingDriverUtilityTest, ADriverWhoseLatestSamplesFailIsLoggedAndSki
                                                     "getting latest samples", "done getting latest samples"));
 }
 
-TEST_F(TWReportingDriverUtilityTest, LatestSamplesThatDoNotComeWithoutErrorAreSkippedSilently) {
+TEST_F(TWReportingDriverUtilityTest, MissingLatestSamplesWithoutAnErrorAreSkippedSilently) {
   chanmeter.fail(Operation::kCreateSamples, {}, kSpeaker);
   EXPECT_THAT(report({simple(speaker("volts"), 12), simple(keyIn("Tx", "frames"), 101)}), SizeIs(1));
   EXPECT_THAT(logged(LogLevel::kError), IsEmpty());
@@ -340,7 +340,7 @@ TEST_F(TWReportingDriverUtilityTest, ADeltaThatFailsIsLoggedWithTheSamplesTextAn
   EXPECT_THAT(logged(LogLevel::kError), ElementsAre("ChanmeterCreateSamples error 6"));
 }
 
-TEST_F(TWReportingDriverUtilityTest, ADeltaThatDoesNotComeWithoutErrorIsSkippedSilently) {
+TEST_F(TWReportingDriverUtilityTest, AMissingDeltaWithoutAnErrorIsSkippedSilently) {
   chanmeter.fail(Operation::kCreateSamplesDelta, {}, kSpeaker);
   EXPECT_THAT(report({simple(speaker("volts"), 12), simple(keyIn("Tx", "frames"), 101)}), SizeIs(1));
   EXPECT_THAT(logged(LogLevel::kError), IsEmpty());

@@ -52,7 +52,7 @@ TEST_F(TWReportingSessionDriverSnapshotWorkerTest, IsMadeForAnySessionAndHoldsIt
   EXPECT_EQ(session.use_count(), 1);
 }
 
-TEST_F(TWReportingSessionDriverSnapshotWorkerTest, StartTakesASnapshotAndSaysThatItStarted) {
+TEST_F(TWReportingSessionDriverSnapshotWorkerTest, StartTakesASnapshotAndReturnsTrue) {
   EXPECT_EQ(worker.driverSnapShot(), std::nullopt);
   EXPECT_EQ(worker.start(), true);
   ASSERT_TRUE(worker.driverSnapShot());
@@ -102,7 +102,7 @@ TEST_F(TWReportingSessionDriverSnapshotWorkerTest, ASecondStartReplacesTheSnapsh
   EXPECT_THAT(sentTo(*session), ElementsAre(volts(1)));
 }
 
-TEST_F(TWReportingSessionDriverSnapshotWorkerTest, StopBeforeAnyStartInTheProcessDoesNothingAtAll) {
+TEST_F(TWReportingSessionDriverSnapshotWorkerTest, StopBeforeAnyStartInTheProcessDoesNothing) {
   worker.stop();
   EXPECT_THAT(sentTo(*session), IsEmpty());
   EXPECT_THAT(chanmeter.calls(), IsEmpty());
@@ -130,7 +130,7 @@ TEST_F(TWReportingSessionDriverSnapshotWorkerTest, ASecondStopSendsNothing) {
   EXPECT_THAT(sentTo(*session), ElementsAre(volts(2)));
 }
 
-TEST_F(TWReportingSessionDriverSnapshotWorkerTest, StopAfterItsSessionIsGoneDropsTheSnapshot) {
+TEST_F(TWReportingSessionDriverSnapshotWorkerTest, StopAfterItsSessionHasEndedDropsTheSnapshot) {
   EXPECT_EQ(worker.start(), true);
   session.reset();
   setVolts(12);
@@ -175,7 +175,7 @@ TEST_F(TWReportingSessionDriverSnapshotWorkerTest,
   EXPECT_EQ(chanmeter.heldSamples(), 0U);
 }
 
-// With the daemon's workers.
+// Runs the worker together with the daemon's other workers.
 class DriverStatisticsOfASessionTest : public DriverTest {
  protected:
   DriverStatisticsOfASessionTest() { useWorkers(allWorkerClasses()); }

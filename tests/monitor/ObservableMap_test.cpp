@@ -17,10 +17,10 @@ class ObservableMapTest : public ::testing::Test {
  protected:
   using Observation = ObservableMap::Observation;
 
-  // An observer that writes down its name, the key and what the map says then.
+  // Makes an observer that records its name, the key and the value in the map.
   ObservableMap::Observer recorder(const std::string& name) {
     return [this, name](std::string_view key) {
-      woken.push_back(name + " " + std::string(key) + map->find(key)->text());
+      notified.push_back(name + " " + std::string(key) + map->find(key)->text());
     };
   }
   Observation observe(std::string_view key, ObservableMap::Observer observer) {
@@ -28,10 +28,10 @@ class ObservableMapTest : public ::testing::Test {
   }
 
   std::shared_ptr<ObservableMap> map = std::make_shared<ObservableMap>();
-  std::vector<std::string> woken;
+  std::vector<std::string> notified;
 };
 
-TEST_F(ObservableMapTest, HoldsWhatWasSetLast) {
+TEST_F(ObservableMapTest, FindsTheValueThatWasSetLast) {
   EXPECT_EQ(map->find("a"), std::nullopt);
   map->set("a", {{"n", 1}});
   map->set("a", {{"n", 2}});
@@ -39,36 +39,36 @@ TEST_F(ObservableMapTest, HoldsWhatWasSetLast) {
   EXPECT_EQ(map->find("b"), std::nullopt);
 }
 
-TEST_F(ObservableMapTest, WakesTheObserversOfAKeyInsideTheSetInTheirOrder) {
+TEST_F(ObservableMapTest, NotifiesTheObserversOfAKeyInOrderBeforeSetReturns) {
   const auto first = observe("a", recorder("first"));
   const auto other = observe("b", recorder("other"));
   const auto second = observe("a", recorder("second"));
   map->set("a", {{"n", 1}});
-  EXPECT_THAT(woken, ElementsAre(R"(first a{"n":1})", R"(second a{"n":1})"));
+  EXPECT_THAT(notified, ElementsAre(R"(first a{"n":1})", R"(second a{"n":1})"));
 }
 
-TEST_F(ObservableMapTest, AnEqualValueWakesToo) {
+TEST_F(ObservableMapTest, SettingAnEqualValueNotifiesToo) {
   const auto observation = observe("a", recorder("it"));
   map->set("a", {{"n", 1}});
   map->set("a", {{"n", 1}});
-  EXPECT_EQ(woken.size(), 2U);
+  EXPECT_EQ(notified.size(), 2U);
 }
 
-TEST_F(ObservableMapTest, NoneIsWokenAfterItsObservationEnded) {
+TEST_F(ObservableMapTest, AnObserverIsNotNotifiedAfterItsObservationHasEnded) {
   auto observation = observe("a", recorder("it"));
   observation = {};
   map->set("a", {});
-  EXPECT_THAT(woken, IsEmpty());
+  EXPECT_THAT(notified, IsEmpty());
   EXPECT_EQ(map->observerCount(), 0U);
 }
 
-TEST_F(ObservableMapTest, AMovedObservationGoesOn) {
+TEST_F(ObservableMapTest, AMovedObservationStaysInEffect) {
   auto observation = observe("a", recorder("it"));
   Observation moved(std::move(observation));
   Observation again;
   again = std::move(moved);
   map->set("a", {});
-  EXPECT_EQ(woken.size(), 1U);
+  EXPECT_EQ(notified.size(), 1U);
   EXPECT_EQ(map->observerCount(), 1U);
 }
 
@@ -86,15 +86,15 @@ TEST_F(ObservableMapTest, AnObserverMayEndItsOwnObservation) {
   const std::string captured = "alive";
   observation = observe("a", [&, captured](std::string_view) {
     observation = {};
-    woken.push_back(captured);  // what the observer holds outlives the call
+    notified.push_back(captured);  // the observer outlives the call
   });
   const auto other = observe("a", recorder("other"));
   map->set("a", {});
   map->set("a", {});
-  EXPECT_THAT(woken, ElementsAre("alive", "other a{}", "other a{}"));
+  EXPECT_THAT(notified, ElementsAre("alive", "other a{}", "other a{}"));
 }
 
-TEST_F(ObservableMapTest, AnObserverMayEndOthersBeforeAndBehindIt) {
+TEST_F(ObservableMapTest, AnObserverMayEndOthersBeforeAndAfterIt) {
   Observation before;
   Observation behind;
   before = observe("a", recorder("before"));
@@ -105,16 +105,16 @@ TEST_F(ObservableMapTest, AnObserverMayEndOthersBeforeAndBehindIt) {
   behind = observe("a", recorder("behind"));
   const auto last = observe("a", recorder("last"));
   map->set("a", {});
-  EXPECT_THAT(woken, ElementsAre("before a{}", "last a{}"));
+  EXPECT_THAT(notified, ElementsAre("before a{}", "last a{}"));
   map->set("a", {});
-  EXPECT_THAT(woken, ElementsAre("before a{}", "last a{}", "last a{}"));
+  EXPECT_THAT(notified, ElementsAre("before a{}", "last a{}", "last a{}"));
 }
 
-TEST_F(ObservableMapTest, AnObserverThatComesWhileOthersAreWokenIsWokenTheNextTime) {
+TEST_F(ObservableMapTest, AnObserverAddedDuringASetIsNotNotifiedOfThatSet) {
   Observation late;
   const auto observation = observe("a", [&](std::string_view) { late = observe("a", recorder("late")); });
   map->set("a", {});
-  EXPECT_THAT(woken, IsEmpty());
+  EXPECT_THAT(notified, IsEmpty());
   map->set("b", {});
   EXPECT_EQ(map->observerCount(), 2U);
 }
@@ -127,14 +127,14 @@ TEST_F(ObservableMapTest, AnObserverMaySetTheMap) {
   });
   const auto second = observe("a", recorder("second"));
   map->set("a", {{"n", 1}});
-  // The inner set wakes everybody; the outer one then goes on with what holds by now.
-  EXPECT_THAT(woken, ElementsAre("b's b{}", R"(second a{"n":2})", "b's b{}", R"(second a{"n":2})"));
+  // The inner set notifies all observers. The outer set then continues with the current value.
+  EXPECT_THAT(notified, ElementsAre("b's b{}", R"(second a{"n":2})", "b's b{}", R"(second a{"n":2})"));
 }
 
 TEST_F(ObservableMapTest, EndingAnObservationWaitsForItsObserverOnAnotherThread) {
   std::atomic<bool> isRunning = false;
   std::atomic<bool> mayEnd = false;
-  bool hasEnded = false;  // no atomic: the wait orders it
+  bool hasEnded = false;  // need not be atomic, because the wait orders the accesses
   auto observation = observe("a", [&](std::string_view) {
     isRunning = true;
     isRunning.notify_all();
@@ -153,7 +153,7 @@ TEST_F(ObservableMapTest, EndingAnObservationWaitsForItsObserverOnAnotherThread)
   releaser.join();
 }
 
-TEST_F(ObservableMapTest, ReadingJudgingAndSettingUnderTheLockIsOneStep) {
+TEST_F(ObservableMapTest, ReadingAndSettingUnderTheLockIsOneStep) {
   constexpr int kEach = 2000;
   const auto count = [&] {
     for (int at = 0; at < kEach; ++at) {

@@ -22,7 +22,7 @@ using Worker = TWReportingSessionSystemMonitorWorker;
 constexpr char kRinger[] = "com.orvane.homedeck.ringerstate";
 constexpr char kReporting[] = "com.orvane.tonewerk.reporting";
 
-// A consumer that does what the test wants with each message.
+// Passes each message to a function of the test.
 class Listener final : public TWReportingSessionWorkerConsumerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
@@ -43,10 +43,10 @@ decltype(Listener::onMessage) Listener::onMessage;
 class SystemMonitorWorkerTest : public ReportingTest {
  protected:
   SystemMonitorWorkerTest() : ReportingTest({&Listener::kWorkerClass, &Worker::kWorkerClass}) {
-    Listener::onMessage = [this](TWReportingSession& session, const TWReportingSessionMessage& heard) {
-      EXPECT_EQ(heard.category, 8U);
-      EXPECT_EQ(heard.type, 5U);
-      messages.emplace_back(session.reporterID(), heard.message);
+    Listener::onMessage = [this](TWReportingSession& session, const TWReportingSessionMessage& message) {
+      EXPECT_EQ(message.category, 8U);
+      EXPECT_EQ(message.type, 5U);
+      messages.emplace_back(session.reporterID(), message.message);
     };
   }
   ~SystemMonitorWorkerTest() override { Listener::onMessage = nullptr; }
@@ -61,7 +61,7 @@ class SystemMonitorWorkerTest : public ReportingTest {
     EXPECT_FALSE(test.notifications.post(name, state));
     test.queues.runAll();
   }
-  void nameDevice(const char* name) {
+  void setDeviceName(const char* name) {
     EXPECT_FALSE(test.preferences.write("com.orvane.tonewerk", "device_name", name));
   }
   std::shared_ptr<TWReportingSession> startSession(ReporterID reporterID = 77) {
@@ -69,8 +69,8 @@ class SystemMonitorWorkerTest : public ReportingTest {
     session->start();
     return session;
   }
-  // What was heard since the last time, "identifier key=value" a message.
-  std::vector<std::string> heard() {
+  // Returns the messages since the last call, each as "identifier key=value".
+  std::vector<std::string> takeTexts() {
     std::vector<std::string> texts;
     for (const auto& [reporterID, payload] : std::exchange(messages, {})) {
       const ValueMap::Entry& first = *payload.begin();
@@ -91,40 +91,40 @@ TEST_F(SystemMonitorWorkerTest, IsAProducerAndNothingElse) {
   EXPECT_FALSE(workerClass.handleSingleMessageSession);
 }
 
-TEST_F(SystemMonitorWorkerTest, TellsASessionThatStartsTheStateOfEveryFeatureInOrder) {
+TEST_F(SystemMonitorWorkerTest, SendsASessionThatStartsTheStateOfEveryFeatureInOrder) {
   EXPECT_FALSE(test.preferences.write("com.orvane.homedeck", "spatial-audio-accessory-feature", 2));
-  nameDevice("Kitchen");
+  setDeviceName("Kitchen");
   initialize();
   post(kRinger, 1);
   startSession();
-  EXPECT_THAT(heard(), ElementsAre("77 spatial-audio-accessory-feature=2", "77 device_name=Kitchen",
-                                   "77 ringerstate=1"));
+  EXPECT_THAT(takeTexts(), ElementsAre("77 spatial-audio-accessory-feature=2", "77 device_name=Kitchen",
+                                       "77 ringerstate=1"));
 }
 
-TEST_F(SystemMonitorWorkerTest, ARingerWithoutStateAtTheStartIsToldOfAtItsFirstNotification) {
-  nameDevice("Kitchen");
+TEST_F(SystemMonitorWorkerTest, ARingerWithoutStateAtTheStartIsSentAtItsFirstNotification) {
+  setDeviceName("Kitchen");
   initialize();
   const auto session = startSession();
-  EXPECT_THAT(heard(), ElementsAre("77 device_name=Kitchen"));
+  EXPECT_THAT(takeTexts(), ElementsAre("77 device_name=Kitchen"));
   post(kRinger, 1);
-  EXPECT_THAT(heard(), ElementsAre("77 ringerstate=1"));
+  EXPECT_THAT(takeTexts(), ElementsAre("77 ringerstate=1"));
 }
 
-TEST_F(SystemMonitorWorkerTest, TheTimeOfTheReadIsToldAsLastUpdatedAndTheMessageHasItsOwn) {
+TEST_F(SystemMonitorWorkerTest, TheTimeOfTheReadIsSentAsLastUpdatedAndTheMessageHasItsOwnTime) {
   initialize();
   const auto session = startSession();
   const double readAt = test.clock.now();
   map()->set("ringerstate",
              {{"ringerstate", true}, {"twreporting_timestamp", readAt - 7}, {"systemuptime_sec", 43}});
   ASSERT_EQ(messages.size(), 1U);
-  const ValueMap& told = messages[0].second;
-  EXPECT_EQ(*told.find("ringerstate"), Value(true));
-  EXPECT_EQ(*told.find("last_updated"), Value(readAt - 7));
-  EXPECT_EQ(*told.find("twreporting_timestamp"), Value(readAt));
-  EXPECT_FALSE(told.contains("systemuptime_sec"));
+  const ValueMap& sent = messages[0].second;
+  EXPECT_EQ(*sent.find("ringerstate"), Value(true));
+  EXPECT_EQ(*sent.find("last_updated"), Value(readAt - 7));
+  EXPECT_EQ(*sent.find("twreporting_timestamp"), Value(readAt));
+  EXPECT_FALSE(sent.contains("systemuptime_sec"));
 }
 
-TEST_F(SystemMonitorWorkerTest, TheMapsOwnStateStaysAsItIs) {
+TEST_F(SystemMonitorWorkerTest, TheStateInTheMapIsNotChanged) {
   initialize();
   const auto session = startSession();
   post(kRinger, 1);
@@ -132,7 +132,7 @@ TEST_F(SystemMonitorWorkerTest, TheMapsOwnStateStaysAsItIs) {
   EXPECT_FALSE(map()->find("ringerstate")->contains("last_updated"));
 }
 
-TEST_F(SystemMonitorWorkerTest, AStateWithoutATimeIsToldAsItIs) {
+TEST_F(SystemMonitorWorkerTest, AStateWithoutATimeIsSentUnchanged) {
   initialize();
   const auto session = startSession();
   map()->set("ringerstate", {{"ringerstate", true}, {"systemuptime_sec", 43}});
@@ -141,73 +141,73 @@ TEST_F(SystemMonitorWorkerTest, AStateWithoutATimeIsToldAsItIs) {
   EXPECT_EQ(messages[0].second.integer("systemuptime_sec"), 43);
 }
 
-TEST_F(SystemMonitorWorkerTest, AnEmptyOrAbsentStateTellsNothing) {
+TEST_F(SystemMonitorWorkerTest, AnEmptyOrAbsentStateIsNotSent) {
   initialize();
   const auto session = startSession();
   map()->set("ringerstate", {});
   map()->set("ringerstate", {{"twreporting_timestamp", 1.0}, {"systemuptime_sec", 1}});
-  EXPECT_THAT(heard(), ElementsAre("77 last_updated=1"));
+  EXPECT_THAT(takeTexts(), ElementsAre("77 last_updated=1"));
   Worker(session).handleChange(nullptr);
-  EXPECT_THAT(heard(), IsEmpty());
+  EXPECT_THAT(takeTexts(), IsEmpty());
 }
 
-TEST_F(SystemMonitorWorkerTest, EveryRunningSessionIsToldOfAChange) {
+TEST_F(SystemMonitorWorkerTest, AChangeIsSentToEveryStartedSession) {
   initialize();
   const auto first = startSession(1);
   const auto second = startSession(2);
   post(kRinger, 1);
-  EXPECT_THAT(heard(), ElementsAre("1 ringerstate=1", "2 ringerstate=1"));
+  EXPECT_THAT(takeTexts(), ElementsAre("1 ringerstate=1", "2 ringerstate=1"));
 }
 
 TEST_F(SystemMonitorWorkerTest, AChangeBecomesPartOfTheSessionsState) {
   initialize();
   const auto session = startSession();
-  nameDevice("Kitchen");
+  setDeviceName("Kitchen");
   post(kReporting, 0);
   EXPECT_EQ(session->previousValues().text("device_name"), "Kitchen");
   EXPECT_THAT(textsUnder("device_name", session->messages()), ElementsAre("(null)", "Kitchen"));
 }
 
-TEST_F(SystemMonitorWorkerTest, AStoppedSessionIsToldNothing) {
+TEST_F(SystemMonitorWorkerTest, NothingIsSentToAStoppedSession) {
   initialize();
   const auto session = startSession();
   session->stop();
   EXPECT_EQ(map()->observerCount(), 0U);
   post(kRinger, 1);
-  EXPECT_THAT(heard(), IsEmpty());
+  EXPECT_THAT(takeTexts(), IsEmpty());
 }
 
-TEST_F(SystemMonitorWorkerTest, ASessionThatStartsAgainIsToldAgainAndOnce) {
+TEST_F(SystemMonitorWorkerTest, ASessionThatStartsAgainGetsEachStateOnceAgain) {
   initialize();
   const auto session = startSession();
   post(kRinger, 1);
   session->stop();
-  heard();
+  takeTexts();
   session->start();
-  EXPECT_THAT(heard(), ElementsAre("77 ringerstate=1"));
+  EXPECT_THAT(takeTexts(), ElementsAre("77 ringerstate=1"));
   post(kRinger, 0);
-  EXPECT_THAT(heard(), ElementsAre("77 ringerstate=0"));
+  EXPECT_THAT(takeTexts(), ElementsAre("77 ringerstate=0"));
 }
 
-TEST_F(SystemMonitorWorkerTest, ASessionThatIsLetGoWithoutAStopIsToldNothing) {
+TEST_F(SystemMonitorWorkerTest, NothingIsSentToASessionThatIsDestroyedWithoutAStop) {
   initialize();
   auto session = startSession();
   session.reset();
   EXPECT_EQ(map()->observerCount(), 0U);
   post(kRinger, 1);
-  EXPECT_THAT(heard(), IsEmpty());
+  EXPECT_THAT(takeTexts(), IsEmpty());
 }
 
 TEST_F(SystemMonitorWorkerTest, AWorkerMadeBeforeTheMonitorDoesNothingAndStopsWithoutFailing) {
   const auto session = startSession();
   initialize();
   post(kRinger, 1);
-  EXPECT_THAT(heard(), IsEmpty());
+  EXPECT_THAT(takeTexts(), IsEmpty());
   session->stop();
   EXPECT_FALSE(session->started());
 }
 
-TEST_F(SystemMonitorWorkerTest, ReportsSuccessAtItsStartWithAndWithoutAMonitor) {
+TEST_F(SystemMonitorWorkerTest, StartSucceedsWithAndWithoutAMonitor) {
   const auto session = makeSession();
   EXPECT_EQ(Worker(session).start(), true);
   initialize();
@@ -219,11 +219,11 @@ TEST_F(SystemMonitorWorkerTest, AWorkerOutlivesTheMonitor) {
   const auto session = startSession();
   TWReportingSystemMonitor::reset();
   post(kRinger, 1);
-  EXPECT_THAT(heard(), IsEmpty());
+  EXPECT_THAT(takeTexts(), IsEmpty());
   session->stop();
 }
 
-TEST_F(SystemMonitorWorkerTest, ASessionMayStopInsideTheMessageThatTellsOfAChange) {
+TEST_F(SystemMonitorWorkerTest, ASessionMayStopWhileItHandlesTheMessageOfAChange) {
   initialize();
   const auto first = startSession(1);
   const auto second = startSession(2);
@@ -235,13 +235,13 @@ TEST_F(SystemMonitorWorkerTest, ASessionMayStopInsideTheMessageThatTellsOfAChang
     second->stop();
   };
   post(kRinger, 1);
-  EXPECT_THAT(heard(), ElementsAre("1 ringerstate=1"));
+  EXPECT_THAT(takeTexts(), ElementsAre("1 ringerstate=1"));
   EXPECT_FALSE(first->started() || second->started());
   post(kRinger, 0);
-  EXPECT_THAT(heard(), IsEmpty());
+  EXPECT_THAT(takeTexts(), IsEmpty());
 }
 
-TEST_F(SystemMonitorWorkerTest, ASessionMayStartInsideTheMessageThatTellsOfAChange) {
+TEST_F(SystemMonitorWorkerTest, ASessionMayStartWhileAnotherHandlesTheMessageOfAChange) {
   initialize();
   const auto first = startSession(1);
   std::shared_ptr<TWReportingSession> second;
@@ -254,11 +254,12 @@ TEST_F(SystemMonitorWorkerTest, ASessionMayStartInsideTheMessageThatTellsOfAChan
     }
   };
   post(kRinger, 1);
-  // The second is told at its start; the change it came in wakes only those that were there before.
-  EXPECT_THAT(heard(), ElementsAre("1 ringerstate=1", "2 ringerstate=1"));
+  // The second session gets the state at its start. The change itself notifies only the sessions that had
+  // started before it.
+  EXPECT_THAT(takeTexts(), ElementsAre("1 ringerstate=1", "2 ringerstate=1"));
 }
 
-TEST_F(SystemMonitorWorkerTest, ASessionMayEndInsideTheMessageThatTellsOfAChange) {
+TEST_F(SystemMonitorWorkerTest, ASessionMayBeDestroyedWhileItHandlesTheMessageOfAChange) {
   initialize();
   auto session = startSession();
   Listener::onMessage = [&](TWReportingSession&, const TWReportingSessionMessage&) { session.reset(); };

@@ -74,7 +74,7 @@ TEST_F(SystemMonitorTest, InitializingTwiceKeepsTheFirstMonitorAndItsQueue) {
   EXPECT_EQ(first->find("ringerstate"), state("ringerstate", true));
 }
 
-TEST_F(SystemMonitorTest, ReadsThePreferencesAtItsMaking) {
+TEST_F(SystemMonitorTest, ReadsThePreferencesWhenItIsMade) {
   write(kHomedeck, kAccessory, 3);
   write(kSuite, "device_name", "Kitchen");
   test.system.setUptime(99.5);
@@ -83,7 +83,7 @@ TEST_F(SystemMonitorTest, ReadsThePreferencesAtItsMaking) {
   EXPECT_EQ(map()->find("device_name"), state("device_name", "Kitchen"));
 }
 
-TEST_F(SystemMonitorTest, AValueIsKeptAsItIsStored) {
+TEST_F(SystemMonitorTest, AValueIsKeptUnchanged) {
   write(kSuite, "device_name", ValueArray{1, "two"});
   write(kHomedeck, kAccessory, false);
   initialize();
@@ -111,7 +111,7 @@ TEST_F(SystemMonitorTest, AFeatureThatWasNeverReadableHasNoEntry) {
   }
 }
 
-// The ringer is only known once somebody says so, even where its state is posted already.
+// The monitor reads the ringer only after a notification, also when its state was posted before.
 TEST_F(SystemMonitorTest, TheRingerHasNoEntryBeforeItsFirstNotification) {
   EXPECT_FALSE(test.notifications.post(kRinger, 1));
   initialize();
@@ -128,7 +128,7 @@ TEST_F(SystemMonitorTest, ARingerNotificationWhoseStateReads2StoresFalse) {
   EXPECT_EQ(map()->find("ringerstate")->find("ringerstate")->kind(), Value::Kind::kBoolean);
 }
 
-TEST_F(SystemMonitorTest, TheRingerIsOnForTheState1Alone) {
+TEST_F(SystemMonitorTest, TheRingerIsOnOnlyInState1) {
   initialize();
   for (const auto& [posted, expected] : std::vector<std::pair<std::uint64_t, bool>>{
            {1, true}, {0, false}, {0x1'0000'0001, false}, {1, true}, {UINT64_MAX, false}}) {
@@ -137,7 +137,7 @@ TEST_F(SystemMonitorTest, TheRingerIsOnForTheState1Alone) {
   }
 }
 
-TEST_F(SystemMonitorTest, AStateThatCannotBeReadLeavesWhatWasKnown) {
+TEST_F(SystemMonitorTest, AnUnreadableStateKeepsTheLastKnownState) {
   initialize();
   post(kRinger, 1);
   const auto before = map()->find("ringerstate");
@@ -148,7 +148,7 @@ TEST_F(SystemMonitorTest, AStateThatCannotBeReadLeavesWhatWasKnown) {
   EXPECT_EQ(map()->find("ringerstate"), before);
 }
 
-TEST_F(SystemMonitorTest, ANotificationReadsItsPreferenceAnew) {
+TEST_F(SystemMonitorTest, ANotificationMakesItReadThePreferenceAgain) {
   initialize();
   write(kSuite, "device_name", "Kitchen");
   write(kHomedeck, kAccessory, true);
@@ -161,7 +161,7 @@ TEST_F(SystemMonitorTest, ANotificationReadsItsPreferenceAnew) {
   EXPECT_EQ(map()->find(kAccessory), state(kAccessory, true));
 }
 
-TEST_F(SystemMonitorTest, APreferenceThatIsGoneLeavesWhatWasKnown) {
+TEST_F(SystemMonitorTest, ARemovedPreferenceKeepsTheLastKnownState) {
   write(kSuite, "device_name", "Kitchen");
   initialize();
   const auto before = map()->find("device_name");
@@ -172,23 +172,23 @@ TEST_F(SystemMonitorTest, APreferenceThatIsGoneLeavesWhatWasKnown) {
   EXPECT_EQ(map()->find("device_name"), before);
 }
 
-TEST_F(SystemMonitorTest, TwoNotificationsWithTheSameValueWakeTwiceSinceTheyWereReadAtOtherTimes) {
+TEST_F(SystemMonitorTest, TwoNotificationsWithTheSameValueReadAtDifferentTimesNotifyTwice) {
   write(kSuite, "device_name", "Kitchen");
   initialize();
-  std::vector<ValueMap> woken;
+  std::vector<ValueMap> notified;
   const auto observation = ObservableMap::observe(
-      map(), "device_name", [&](std::string_view key) { woken.push_back(*map()->find(key)); });
+      map(), "device_name", [&](std::string_view key) { notified.push_back(*map()->find(key)); });
   EXPECT_FALSE(test.notifications.post(kReporting));  // at the same time as the first read
   run();
-  EXPECT_THAT(woken, IsEmpty());
+  EXPECT_THAT(notified, IsEmpty());
   test.clock.advance(1.0);
   EXPECT_FALSE(test.notifications.post(kReporting));
   run();
   const ValueMap second = state("device_name", "Kitchen");
-  test.system.setUptime(101.0);  // the other of the two times
+  test.system.setUptime(101.0);  // the other of the two times that a read records
   EXPECT_FALSE(test.notifications.post(kReporting));
   run();
-  EXPECT_THAT(woken, ElementsAre(second, state("device_name", "Kitchen", 101)));
+  EXPECT_THAT(notified, ElementsAre(second, state("device_name", "Kitchen", 101)));
 }
 
 TEST_F(SystemMonitorTest, HandlersAndObserversRunOnTheQueue) {
@@ -202,20 +202,20 @@ TEST_F(SystemMonitorTest, HandlersAndObserversRunOnTheQueue) {
   EXPECT_TRUE(onQueue);
 }
 
-TEST_F(SystemMonitorTest, ObserversRunInsideTheMapsLock) {
+TEST_F(SystemMonitorTest, ObserversRunWhileTheMapsLockIsHeld) {
   initialize();
   std::thread other;
-  std::atomic<bool> isComing = false;
-  bool isDone = false;  // no atomic: the lock orders it
+  std::atomic<bool> hasStarted = false;
+  bool isDone = false;  // need not be atomic, because the lock orders the accesses
   const auto held = map();
   const auto observation = ObservableMap::observe(held, "ringerstate", [&](std::string_view) {
     other = std::thread([&] {
-      isComing = true;
-      isComing.notify_all();
+      hasStarted = true;
+      hasStarted.notify_all();
       EXPECT_NE(held->find("ringerstate"), std::nullopt);
       EXPECT_TRUE(isDone);
     });
-    isComing.wait(false);
+    hasStarted.wait(false);
     isDone = true;
   });
   post(kRinger, 1);
@@ -238,7 +238,7 @@ TEST_F(SystemMonitorTest, ARegistrationThatFailsIsLoggedAndItsFeatureKept) {
   EXPECT_EQ(monitor->getFeatureState("ringerstate"), std::nullopt);
 }
 
-TEST_F(SystemMonitorTest, SaysWhatItIsDoingAtItsMaking) {
+TEST_F(SystemMonitorTest, LogsItsStepsWhenItIsMade) {
   initialize();
   constexpr char kTable[] =
       R"({"spatial-audio-accessory-feature":{"defaults_domain":"com.orvane.homedeck",)"
@@ -257,7 +257,7 @@ TEST_F(SystemMonitorTest, SaysWhatItIsDoingAtItsMaking) {
   EXPECT_EQ(texts(LogLevel::kDefault).size(), 6U);
 }
 
-TEST_F(SystemMonitorTest, SaysWhichFeatureChanged) {
+TEST_F(SystemMonitorTest, LogsWhichFeatureChanged) {
   initialize();
   test.log.clear();
   post(kRinger, 1);
@@ -266,7 +266,7 @@ TEST_F(SystemMonitorTest, SaysWhichFeatureChanged) {
   EXPECT_THAT(test.log.lines(), ::testing::SizeIs(2));
 }
 
-TEST_F(SystemMonitorTest, WhatIsNoFeatureHasNoState) {
+TEST_F(SystemMonitorTest, AnUnknownFeatureHasNoState) {
   const auto monitor = TWReportingSystemMonitor::initWithQueue(queue());
   EXPECT_EQ(monitor->getFeatureState("volume"), std::nullopt);
   EXPECT_EQ(monitor->getFeatureState(""), std::nullopt);
@@ -277,7 +277,7 @@ TEST_F(SystemMonitorTest, ResetEndsTheRegistrationsAndDropsTheMonitor) {
   initialize();
   EXPECT_THAT(test.notifications.registered(), ElementsAre(kAccessoryChanged, kReporting, kRinger));
   const auto held = map();
-  EXPECT_FALSE(test.notifications.post(kRinger, 1));  // queued already
+  EXPECT_FALSE(test.notifications.post(kRinger, 1));  // its handler is queued already
   TWReportingSystemMonitor::reset();
   EXPECT_THAT(test.notifications.registered(), IsEmpty());
   run();
@@ -285,7 +285,7 @@ TEST_F(SystemMonitorTest, ResetEndsTheRegistrationsAndDropsTheMonitor) {
   EXPECT_EQ(held->find("ringerstate"), std::nullopt);
 }
 
-TEST_F(SystemMonitorTest, AfterResetTheNextIsAFreshOne) {
+TEST_F(SystemMonitorTest, AfterResetTheNextMonitorStartsWithoutState) {
   initialize();
   post(kRinger, 1);
   const auto first = map();
@@ -297,14 +297,14 @@ TEST_F(SystemMonitorTest, AfterResetTheNextIsAFreshOne) {
   EXPECT_NE(map()->find("ringerstate"), std::nullopt);
 }
 
-TEST_F(SystemMonitorTest, AMonitorThatEndsEndsItsRegistrations) {
+TEST_F(SystemMonitorTest, DestroyingAMonitorEndsItsRegistrations) {
   auto monitor = TWReportingSystemMonitor::initWithQueue(queue());
   EXPECT_EQ(test.notifications.registered().size(), 3U);
   monitor.reset();
   EXPECT_THAT(test.notifications.registered(), IsEmpty());
 }
 
-TEST_F(SystemMonitorTest, TheDefaultsSayWhetherReportingIsDisabledAlsoWhenNobodySaidSo) {
+TEST_F(SystemMonitorTest, TheDefaultsSayThatReportingIsNotDisabledWhenNothingIsSet) {
   const ValueMap defaults = TWReportingSystemMonitor::TWReportingDefaults();
   EXPECT_EQ(defaults, (ValueMap{{"disable_reporting", 0}}));
   EXPECT_EQ(defaults.find("disable_reporting")->kind(), Value(0).kind());

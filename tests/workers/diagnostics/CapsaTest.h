@@ -13,7 +13,7 @@
 
 namespace tonewerk {
 
-// An internal build with the haptics instance enabled, and the capture service's double.
+// Base of the capture worker's tests: an internal build on which the haptics instance is enabled.
 class CapsaTest : public ReportingTest {
  protected:
   CapsaTest() : ReportingTest({&TWReportingSessionCapsaWorker::kWorkerClass}) {
@@ -34,7 +34,7 @@ class CapsaTest : public ReportingTest {
     return names;
   }
 
-  // Null when the worker has no such instance.
+  // Returns null when the worker has no such instance.
   static WorkerInstanceState* stateOf(const TWReportingSessionCapsaWorker& worker, std::string_view name) {
     for (const auto& instance : worker.instances()) {
       if (instance->instanceClass().name == name) return &instance->workerState();

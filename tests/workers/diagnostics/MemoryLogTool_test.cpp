@@ -25,12 +25,12 @@ class MemoryLogToolTest : public ReportingTest {
 
 std::string kept(const std::string& output) { return MemoryLogTool::keptLines(output, Filter::kMemoryLines); }
 
-TEST_F(MemoryLogToolTest, SaysWhatItRunsAndThatItHasCaptured) {
+TEST_F(MemoryLogToolTest, LogsWhatItRunsAndThatItHasCaptured) {
   EXPECT_EQ(capture({"one\ntwo\n"}), "one\ntwo\n");
   EXPECT_THAT(errors(), ElementsAre("wiredlog: requesting 'tool'", "wiredlog: request tool captured"));
 }
 
-TEST_F(MemoryLogToolTest, AToolThatCannotBeStartedIsUnableAndGivesNothing) {
+TEST_F(MemoryLogToolTest, AToolThatCannotBeStartedIsLoggedAndGivesNothing) {
   EXPECT_EQ(MemoryLogTool("no such tool", Filter::kNone).capture(test.commands), "");
   EXPECT_THAT(errors(), ElementsAre("wiredlog: requesting 'no such tool'",
                                     "wiredlog: unable to execute 'no such tool'"));
@@ -43,27 +43,27 @@ TEST_F(MemoryLogToolTest, AToolMayTake4MebibytesAnd30Seconds) {
   EXPECT_EQ(test.commands.runs()[0].limits.time, std::chrono::seconds(30));
 }
 
-TEST_F(MemoryLogToolTest, AToolThatHangsIsSaidToHaveBeenStoppedAndWhatItSaidIsKept) {
+TEST_F(MemoryLogToolTest, AToolThatHangsIsLoggedAsStoppedAndItsOutputIsKept) {
   EXPECT_EQ(capture({"half a li", End::kTooLong}), "half a li");
   EXPECT_THAT(errors(),
               ElementsAre("wiredlog: requesting 'tool'", "wiredlog: 'tool' was stopped after 30 seconds",
                           "wiredlog: request tool captured"));
 }
 
-TEST_F(MemoryLogToolTest, AToolThatWritesWithoutEndIsSaidToHaveBeenStopped) {
+TEST_F(MemoryLogToolTest, AToolThatWritesTooMuchIsLoggedAsStopped) {
   EXPECT_EQ(capture({"y\ny\n", End::kTooMuch}), "y\ny\n");
   EXPECT_THAT(errors(),
               ElementsAre("wiredlog: requesting 'tool'", "wiredlog: 'tool' was stopped after 4194304 bytes",
                           "wiredlog: request tool captured"));
 }
 
-TEST_F(MemoryLogToolTest, AToolThatDiesIsSaidToHaveDied) {
+TEST_F(MemoryLogToolTest, AToolThatASignalEndsIsLogged) {
   EXPECT_EQ(capture({"x\n", End::kSignalled, 11}), "x\n");
   EXPECT_THAT(errors(), ElementsAre("wiredlog: requesting 'tool'", "wiredlog: 'tool' died of signal 11",
                                     "wiredlog: request tool captured"));
 }
 
-TEST_F(MemoryLogToolTest, AToolThatFailsIsSaidToHaveFailed) {
+TEST_F(MemoryLogToolTest, AToolThatFailsIsLogged) {
   EXPECT_EQ(capture({"", End::kExited, 1}), "");
   EXPECT_THAT(errors(), ElementsAre("wiredlog: requesting 'tool'", "wiredlog: 'tool' failed with status 1",
                                     "wiredlog: request tool captured"));
@@ -73,12 +73,12 @@ TEST_F(MemoryLogToolTest, AFilteredToolsOutputIsFiltered) {
   EXPECT_EQ(capture({"noise\nRESOURCE x\n"}, Filter::kMemoryLines), "wiredlog: RESOURCE x\n");
 }
 
-TEST_F(MemoryLogToolTest, WithoutAFilterEverythingIsKeptAsItIs) {
+TEST_F(MemoryLogToolTest, WithoutAFilterTheOutputIsKeptUnchanged) {
   const std::string output = "a\n\n" + std::string(5000, 'x') + "\nno end";
   EXPECT_EQ(MemoryLogTool::keptLines(output, Filter::kNone), output);
 }
 
-TEST_F(MemoryLogToolTest, LinesWithOneOfTheWordsAreKeptMarkedAndInOrder) {
+TEST_F(MemoryLogToolTest, LinesWithOneOfTheWordsAreKeptInOrderWithAPrefix) {
   EXPECT_EQ(kept("top - 10:00\n"
                  " cpu_time 1\n"
                  "a phys_mem 2\n"
@@ -93,7 +93,7 @@ TEST_F(MemoryLogToolTest, LinesWithOneOfTheWordsAreKeptMarkedAndInOrder) {
             "wiredlog: RESOURCE\n");
 }
 
-TEST_F(MemoryLogToolTest, TheWordsSpacesBelongToThem) {
+TEST_F(MemoryLogToolTest, TheSpacesAroundAWordMustMatchToo) {
   EXPECT_EQ(kept("cpu_time 1\n cpu_time\n wired_memory 2\nphys_footprint\nresource\n"), "");
 }
 
@@ -113,7 +113,7 @@ TEST_F(MemoryLogToolTest, AnAllZeroLineThatOnlyALaterWordMatchesIsKept) {
   EXPECT_EQ(kept(line), "wiredlog: " + line);
 }
 
-TEST_F(MemoryLogToolTest, ALineWithResourceIsKeptWithItsMark) {
+TEST_F(MemoryLogToolTest, ALineWithResourceIsKeptWithThePrefix) {
   EXPECT_EQ(kept("  RESOURCE  TOTAL\n"), "wiredlog:   RESOURCE  TOTAL\n");
 }
 

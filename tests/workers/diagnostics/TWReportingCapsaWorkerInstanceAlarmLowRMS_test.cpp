@@ -17,20 +17,20 @@ using ::testing::SizeIs;
 
 class TWReportingCapsaWorkerInstanceAlarmLowRMSTest : public CapsaTest {
  protected:
-  void SetUp() override { begin(makeSessionOf(kServiceAlarms)); }
+  void SetUp() override { useSession(makeSessionOf(kServiceAlarms)); }
 
-  void begin(std::shared_ptr<TWReportingSession> newSession) {
+  void useSession(std::shared_ptr<TWReportingSession> newSession) {
     session = std::move(newSession);
     worker = TWReportingSessionCapsaWorker::initWithSession(session);
     EXPECT_EQ(worker->start(), true);
   }
-  // A quiet alarm, once more; no two alike.
+  // Reports a quiet alarm. No two reports are equal.
   void report(const Value& issue = "LowRMS", AudioEventCategory category = kCategoryError,
               AudioEventType type = kTypeIssueDetector) {
     handle(*worker, {{"issue_type", issue}, {"n", ++reported}}, category, type);
   }
-  // Makes it fire.
-  void stayQuiet() {
+  // Reports often enough and long enough for the instance to fire.
+  void reportUntilItFires() {
     report();
     test.clock.advance(16.0);
     report();
@@ -49,13 +49,13 @@ TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, BeginsWithItsThresholds) {
   EXPECT_TRUE(state().oncePerSession);
 }
 
-TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, IsNotForSessionsOfSingleMessages) {
+TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, IsNotMadeForSingleMessageSessions) {
   session->setSingleMessageSession(true);
   EXPECT_EQ(TWReportingCapsaWorkerInstanceAlarmLowRMS::initWithSession(session), nullptr);
   EXPECT_FALSE(TWReportingCapsaWorkerInstanceAlarmLowRMS::kInstanceClass.handleSingleMessageSession);
 }
 
-TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, WantsLowRmsIssuesAmongErrorsOnly) {
+TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, IsInterestedOnlyInLowRmsIssuesAmongErrors) {
   report();
   EXPECT_EQ(state().interestedCount, 1);
   report("lowrms");
@@ -69,7 +69,7 @@ TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, WantsLowRmsIssuesAmongErro
 
 TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, WatchesAlarmsAndTheTestServiceOnly) {
   for (AudioServiceType service = 0; service <= 14; ++service) {
-    begin(makeSessionOf(service));
+    useSession(makeSessionOf(service));
     report();
     EXPECT_EQ(state().interestedCount, service == 4 || service == 11 ? 1 : 0) << service;
   }
@@ -81,7 +81,7 @@ TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest,
   report();
   test.clock.advance(15.0);
   report();
-  EXPECT_THAT(test.capsa.requests(), IsEmpty());  // three, but not longer
+  EXPECT_THAT(test.capsa.requests(), IsEmpty());  // three messages, but not more than 15 s
   test.clock.advance(0.5);
   report();
   EXPECT_THAT(test.capsa.requests(), SizeIs(1));
@@ -97,21 +97,21 @@ TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, TwoMessagesDoNotFireHoweve
 }
 
 TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, NeverFiresASecondTimeInTheSameSession) {
-  stayQuiet();
-  stayQuiet();
-  stayQuiet();
+  reportUntilItFires();
+  reportUntilItFires();
+  reportUntilItFires();
   worker->stop();
   EXPECT_EQ(worker->start(), true);
-  stayQuiet();
+  reportUntilItFires();
   EXPECT_THAT(test.capsa.requests(), SizeIs(1));
   EXPECT_EQ(state().firedCount, 1);
-  begin(makeSessionOf(kServiceAlarms));
-  stayQuiet();
+  useSession(makeSessionOf(kServiceAlarms));
+  reportUntilItFires();
   EXPECT_THAT(test.capsa.requests(), SizeIs(2));
 }
 
-TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, AsksForACaptureAMinuteLater) {
-  stayQuiet();
+TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, RequestsACaptureOneMinuteLater) {
+  reportUntilItFires();
   ASSERT_THAT(test.capsa.requests(), SizeIs(1));
   const MemoryCapsa::Request request = test.capsa.requests().front();
   EXPECT_FALSE(request.isImmediate);
@@ -128,7 +128,7 @@ TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, AsksForACaptureAMinuteLate
 
 TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, ParametersThatAreNotAcceptedAreAnErrorLine) {
   test.capsa.refuse();
-  stayQuiet();
+  reportUntilItFires();
   EXPECT_THAT(errors(), ElementsAre("Capsa session for alarm Low RMS failed to start."));
   EXPECT_THAT(infos(), IsEmpty());
   worker->stop();
@@ -136,7 +136,7 @@ TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, ParametersThatAreNotAccept
 }
 
 TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, AnAnswerIsKeptAndLogged) {
-  stayQuiet();
+  reportUntilItFires();
   test.log.clear();
   std::thread([&] { test.capsa.answer(0, MemoryCapsa::started("S1")); }).join();
   test.queues.runAll();
@@ -148,7 +148,7 @@ TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, AnAnswerIsKeptAndLogged) {
 }
 
 TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, StoppingCancelsThePendingCapture) {
-  stayQuiet();
+  reportUntilItFires();
   test.capsa.answer(0, MemoryCapsa::started("S1"));
   test.queues.runAll();
   test.log.clear();
@@ -160,7 +160,7 @@ TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, StoppingCancelsThePendingC
 }
 
 TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, StoppingAfterAFailedStartCancelsNoneReturned) {
-  stayQuiet();
+  reportUntilItFires();
   test.capsa.answer(0, MemoryCapsa::failed(kFaultsignErrorDailyLimitExceeded));
   test.queues.runAll();
   worker->stop();
@@ -168,7 +168,7 @@ TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, StoppingAfterAFailedStartC
 }
 
 TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, StoppingWithoutAnAnswerCancelsNothing) {
-  stayQuiet();
+  reportUntilItFires();
   test.log.clear();
   worker->stop();
   EXPECT_THAT(test.capsa.cancelled(), IsEmpty());
@@ -182,7 +182,7 @@ TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, StoppingWithoutAFireCancel
 }
 
 TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, AnAnswerAfterTheStopIsLoggedAndCancelsNothing) {
-  stayQuiet();
+  reportUntilItFires();
   worker->stop();
   worker.reset();
   session.reset();
@@ -193,10 +193,10 @@ TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, AnAnswerAfterTheStopIsLogg
   EXPECT_THAT(test.capsa.cancelled(), IsEmpty());
 }
 
-TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, AStopBehindAnAnswerOnTheWorkQueueFindsTheIdentifier) {
+TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, AStopAfterAnAnswerOnTheWorkQueueFindsTheIdentifier) {
   test.capsa.answerAtOnce(MemoryCapsa::started("S1"));
   context->reportingServerQueue().async([&] {
-    stayQuiet();
+    reportUntilItFires();
     worker->stop();
   });
   test.queues.runAll();
@@ -204,8 +204,8 @@ TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, AStopBehindAnAnswerOnTheWo
 }
 
 TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, InATestSessionTheFireIsSkippedAndNothingIsCancelled) {
-  begin(makeSessionOf(kServiceTest));
-  stayQuiet();
+  useSession(makeSessionOf(kServiceTest));
+  reportUntilItFires();
   EXPECT_THAT(infos(), ElementsAre("Skipping actual fire, as we are running in test mode."));
   EXPECT_THAT(test.capsa.requests(), IsEmpty());
   EXPECT_EQ(state().firedCount, 1);
@@ -213,11 +213,11 @@ TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, InATestSessionTheFireIsSki
   EXPECT_THAT(test.capsa.cancelled(), IsEmpty());
 }
 
-TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, SessionsCountForThemselves) {
+TEST_F(TWReportingCapsaWorkerInstanceAlarmLowRMSTest, EachSessionCountsSeparately) {
   report();
   test.clock.advance(16.0);
   report();
-  begin(makeSessionOf(kServiceAlarms));
+  useSession(makeSessionOf(kServiceAlarms));
   report();
   EXPECT_EQ(state().interestedCount, 1);
   EXPECT_THAT(test.capsa.requests(), IsEmpty());

@@ -20,13 +20,13 @@ class TWReportingCapsaWorkerInstanceHapticLeaksTest : public CapsaTest {
   std::shared_ptr<TWReportingSessionCapsaWorker> makeWorker() {
     return TWReportingSessionCapsaWorker::initWithSession(session);
   }
-  // The hardware has been active for so many seconds, in all.
+  // Reports that the hardware has been active for that many seconds in total.
   static void report(TWReportingSessionCapsaWorker& worker, int seconds,
                      AudioEventType type = kTypeEnergybook) {
     handle(worker, {{"Haptic_Active_Hardware_Time_Seconds", seconds}}, kCategoryGeneric, type);
   }
-  // Makes it fire.
-  void leak(TWReportingSessionCapsaWorker& worker) {
+  // Reports often enough and long enough for the instance to fire.
+  void reportUntilItFires(TWReportingSessionCapsaWorker& worker) {
     report(worker, ++reported);
     test.clock.advance(61.0);
     report(worker, ++reported);
@@ -46,7 +46,8 @@ TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest, BeginsWithItsThresholds) {
   EXPECT_FALSE(own.oncePerSession);
 }
 
-TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest, WantsTheActiveTimeInPowerReportsOfAnyCategory) {
+TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest,
+       IsInterestedInTheActiveTimeInPowerReportsOfAnyCategory) {
   const auto worker = makeWorker();
   handle(*worker, {{"Haptic_Active_Hardware_Time_Seconds", 1}}, 0x40000003, kTypeEnergybook);
   handle(*worker, {{"Haptic_Active_Hardware_Time_Seconds", "later"}}, 0, kTypeEnergybook);
@@ -85,7 +86,7 @@ TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest, OneMessageAloneDoesNotFire
 }
 
 TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest, CapturesAtOnceWithTheSessionsProcesses) {
-  leak(*makeWorker());
+  reportUntilItFires(*makeWorker());
   ASSERT_THAT(test.capsa.requests(), SizeIs(1));
   const MemoryCapsa::Request request = test.capsa.requests().front();
   EXPECT_TRUE(request.isImmediate);
@@ -105,7 +106,7 @@ TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest, CapturesAtOnceWithTheSessi
 TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest, ParametersThatAreNotAcceptedAreAnErrorLine) {
   test.capsa.refuse();
   const auto worker = makeWorker();
-  leak(*worker);
+  reportUntilItFires(*worker);
   EXPECT_THAT(errors(), ElementsAre("Parameters to Capsa session not accepted!"));
   EXPECT_THAT(infos(), IsEmpty());
   EXPECT_EQ(state(*worker).currentCapsaSessionIdentifier, std::nullopt);
@@ -114,7 +115,7 @@ TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest, ParametersThatAreNotAccept
 
 TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest, AnAnswerIsKeptAndLoggedOnTheWorkQueue) {
   const auto worker = makeWorker();
-  leak(*worker);
+  reportUntilItFires(*worker);
   test.log.clear();
   std::thread([&] { test.capsa.answer(0, MemoryCapsa::started("S1")); }).join();
   EXPECT_EQ(state(*worker).currentCapsaSessionIdentifier, std::nullopt);
@@ -133,7 +134,7 @@ TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest, AnAnswerOnTheWorkQueueIsKe
   test.capsa.answerAtOnce(MemoryCapsa::started("S1"));
   const auto worker = makeWorker();
   context->reportingServerQueue().async([&] {
-    leak(*worker);
+    reportUntilItFires(*worker);
     EXPECT_EQ(state(*worker).currentCapsaSessionIdentifier, "S1");
   });
   test.queues.runAll();
@@ -142,7 +143,7 @@ TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest, AnAnswerOnTheWorkQueueIsKe
 
 TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest, AnEmptyAnswerLeavesNoneReturned) {
   const auto worker = makeWorker();
-  leak(*worker);
+  reportUntilItFires(*worker);
   test.log.clear();
   test.capsa.answer(0, std::nullopt);
   test.queues.runAll();
@@ -154,14 +155,14 @@ TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest, AnEmptyAnswerLeavesNoneRet
 TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest, StoppingCancelsNothing) {
   const auto worker = makeWorker();
   EXPECT_EQ(worker->start(), true);
-  leak(*worker);
+  reportUntilItFires(*worker);
   test.capsa.answer(0, MemoryCapsa::started("S1"));
   test.queues.runAll();
   worker->stop();
   EXPECT_THAT(test.capsa.cancelled(), IsEmpty());
 }
 
-// One state for all sessions.
+// All sessions share one state.
 
 TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest, SessionsCountTogether) {
   const auto first = makeWorker();
@@ -196,18 +197,18 @@ TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest, TheStateOutlivesItsSession
 TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest, ATestSessionSkipsTheFireForAllSessions) {
   session->setServiceType(kServiceTest);
   const auto worker = makeWorker();
-  leak(*worker);
+  reportUntilItFires(*worker);
   EXPECT_THAT(test.capsa.requests(), IsEmpty());
   EXPECT_THAT(infos(), ElementsAre("Skipping actual fire, as we are running in test mode."));
   EXPECT_EQ(state(*worker).firedCount, 1);
   EXPECT_EQ(state(*worker).interestedCount, 0);
 }
 
-// Answers that come late.
+// Late answers.
 
-TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest, AnAnswerAfterTheSessionIsGoneIsLoggedAndKeptForAll) {
+TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest, AnAnswerAfterTheSessionHasEndedIsLoggedAndKeptForAll) {
   auto worker = makeWorker();
-  leak(*worker);
+  reportUntilItFires(*worker);
   worker->stop();
   worker.reset();
   session.reset();
@@ -219,8 +220,8 @@ TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest, AnAnswerAfterTheSessionIsG
   EXPECT_EQ(state(*makeWorker()).currentCapsaSessionIdentifier, "S1");
 }
 
-TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest, AnAnswerAfterTheDaemonsInsideIsGoneDoesNothing) {
-  leak(*makeWorker());
+TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest, AnAnswerAfterTheContextHasEndedDoesNothing) {
+  reportUntilItFires(*makeWorker());
   session.reset();
   context.reset();
   test.log.clear();
@@ -229,9 +230,9 @@ TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest, AnAnswerAfterTheDaemonsIns
   EXPECT_THAT(test.log.linesOf("twrb"), IsEmpty());
 }
 
-// As a session drives it: what it adds to messages, and repeats that it does not store.
+// Runs the worker in a session, which adds entries to messages and does not store repeated ones.
 
-TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest, CapturesForASessionThatIsStartedAndFed) {
+TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest, CapturesForAStartedSessionThatGetsMessages) {
   session->start();
   for (const double time : {1.0, 1.0, 2.0}) {
     session->sendMessage(messageAt(test.clock.now(), {{"Haptic_Active_Hardware_Time_Seconds", time}},

@@ -21,7 +21,7 @@ TEST_F(TWReportingCapsaWorkerInstanceVcqDestroyRecordQueueTest, HasNoThresholds)
   EXPECT_FALSE(instance.workerState().oncePerSession);
 }
 
-TEST_F(TWReportingCapsaWorkerInstanceVcqDestroyRecordQueueTest, IsNotForSessionsOfSingleMessages) {
+TEST_F(TWReportingCapsaWorkerInstanceVcqDestroyRecordQueueTest, IsNotMadeForSingleMessageSessions) {
   EXPECT_NE(TWReportingCapsaWorkerInstanceVcqDestroyRecordQueue::initWithSession(session), nullptr);
   session->setSingleMessageSession(true);
   EXPECT_EQ(TWReportingCapsaWorkerInstanceVcqDestroyRecordQueue::initWithSession(session), nullptr);

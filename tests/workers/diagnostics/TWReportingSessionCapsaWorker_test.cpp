@@ -15,7 +15,7 @@ using ::testing::HasSubstr;
 using ::testing::IsEmpty;
 using ::testing::Not;
 
-// What the scripted instance does, and what it was asked to do.
+// Says what the scripted instance does, and records its calls.
 struct Script {
   bool isInterested = true;
   bool canFire = true;
@@ -55,7 +55,7 @@ constexpr TWReportingSessionCapsaWorkerInstanceClass kNeverMade{
       return nullptr;
     }};
 
-// One worker with one scripted instance.
+// Has a worker with one scripted instance.
 class TWReportingSessionCapsaWorkerTest : public CapsaTest {
  protected:
   TWReportingSessionCapsaWorkerTest() {
@@ -78,9 +78,9 @@ class TWReportingSessionCapsaWorkerTest : public CapsaTest {
   TWReportingSessionCapsaWorker worker;
 };
 
-// What a session gets.
+// The workers and instances that a session gets.
 
-TEST_F(TWReportingSessionCapsaWorkerTest, IsAConsumerOfRepeatsTooAlsoInSingleMessageSessions) {
+TEST_F(TWReportingSessionCapsaWorkerTest, IsAConsumerOfRedundantMessagesTooAlsoInSingleMessageSessions) {
   const auto& workerClass = TWReportingSessionCapsaWorker::kWorkerClass;
   EXPECT_EQ(workerClass.name, "TWReportingSessionCapsaWorker");
   EXPECT_TRUE(workerClass.isConsumer);
@@ -127,7 +127,7 @@ TEST_F(TWReportingSessionCapsaWorkerTest,
   EXPECT_THAT(namesOf(*empty), IsEmpty());
 }
 
-TEST_F(TWReportingSessionCapsaWorkerTest, AnInstanceThatDoesNotWantTheSessionIsNotAdded) {
+TEST_F(TWReportingSessionCapsaWorkerTest, AnInstanceThatDoesNotApplyToTheSessionIsNotAdded) {
   worker.addInstance(kNeverMade);
   EXPECT_THAT(namesOf(worker), ElementsAre("ScriptedInstance"));
 }
@@ -150,9 +150,9 @@ TEST_F(TWReportingSessionCapsaWorkerTest, StartsAndStopsItsInstances) {
   EXPECT_THAT(calls(), ElementsAre("stopped"));
 }
 
-// The common rule.
+// The counting rule for all instances.
 
-TEST_F(TWReportingSessionCapsaWorkerTest, AStateBeginsSoThatNothingFires) {
+TEST_F(TWReportingSessionCapsaWorkerTest, WithItsInitialStateAnInstanceNeverFires) {
   const WorkerInstanceState fresh;
   EXPECT_EQ(fresh.currentCapsaSessionIdentifier, std::nullopt);
   EXPECT_EQ(fresh.interestedCount, 0);
@@ -178,7 +178,7 @@ TEST_F(TWReportingSessionCapsaWorkerTest, CountsAnInterestingMessageAndPassesItO
   EXPECT_EQ(state().lastMessage, ValueDigest::of({{"n", 2}}));
 }
 
-TEST_F(TWReportingSessionCapsaWorkerTest, SaysAtDebugLevelWhatItIsInterestedIn) {
+TEST_F(TWReportingSessionCapsaWorkerTest, LogsAtDebugLevelWhatItIsInterestedIn) {
   handle(1);
   EXPECT_THAT(test.log.textsOf("twrb", LogLevel::kDebug),
               ElementsAre("Interested in message. instance=ScriptedInstance, category=Error "
@@ -186,7 +186,7 @@ TEST_F(TWReportingSessionCapsaWorkerTest, SaysAtDebugLevelWhatItIsInterestedIn) 
   EXPECT_THAT(test.log.linesOf("twrb").front().message, HasSubstr("TWReportingSessionCapsaWorker:"));
 }
 
-TEST_F(TWReportingSessionCapsaWorkerTest, AMessageOfNoInterestChangesNothing) {
+TEST_F(TWReportingSessionCapsaWorkerTest, AMessageThatIsNotInterestingChangesNothing) {
   handle(1);
   script_.isInterested = false;
   handle(2);
@@ -208,20 +208,21 @@ TEST_F(TWReportingSessionCapsaWorkerTest, TwoIdenticalInterestingMessagesInARowC
   EXPECT_THAT(calls(), ElementsAre("handled n=1"));
 }
 
-TEST_F(TWReportingSessionCapsaWorkerTest, ARepeatIsToldByItsPayloadWhateverItsKind) {
+TEST_F(TWReportingSessionCapsaWorkerTest, ARepeatIsRecognisedByItsPayloadWhateverItsType) {
   handle(1);
   CapsaTest::handle(worker, {{"n", 1.0}}, kCategorySetup, kTypeStart);
   EXPECT_EQ(state().interestedCount, 1);
 }
 
-TEST_F(TWReportingSessionCapsaWorkerTest, ARepeatOfAnEarlierThanTheLastInterestingMessageCounts) {
+TEST_F(TWReportingSessionCapsaWorkerTest, ARepeatOfAMessageBeforeTheLastInterestingOneCounts) {
   handle(1);
   handle(2);
   handle(1);
   EXPECT_EQ(state().interestedCount, 3);
 }
 
-// Of more than 64 KiB each was once counted: what was not kept was never recognised.
+// Earlier, repeats of payloads over 64 KiB were all counted, because such a payload was not kept for the
+// comparison.
 TEST_F(TWReportingSessionCapsaWorkerTest, ARepeatOfALargePayloadCountsOnceLikeAnyOther) {
   const auto sent = [](char last) {
     return ValueMap{{"n", 1}, {"text", std::string(std::size_t{512} << 10, 'x') + last}};
@@ -278,7 +279,7 @@ TEST_F(TWReportingSessionCapsaWorkerTest, AClockThatWentBackDelaysTheFiring) {
   EXPECT_THAT(calls(), Not(Contains(HasSubstr("fired"))));
 }
 
-TEST_F(TWReportingSessionCapsaWorkerTest, FiringMakesAReporterAndBeginsTheCountingAnew) {
+TEST_F(TWReportingSessionCapsaWorkerTest, FiringMakesAReporterAndRestartsTheCount) {
   fireAfter(2, 10.0);
   handle(1);
   test.clock.advance(11.0);
@@ -290,7 +291,7 @@ TEST_F(TWReportingSessionCapsaWorkerTest, FiringMakesAReporterAndBeginsTheCounti
   EXPECT_EQ(state().interestFirstSeen, std::nullopt);
   EXPECT_EQ(state().lastMessage, std::nullopt);
   calls();
-  handle(2);  // not a repeat any more
+  handle(2);  // is no longer a repeat
   EXPECT_EQ(state().interestedCount, 1);
   test.clock.advance(11.0);
   handle(3);
@@ -298,7 +299,7 @@ TEST_F(TWReportingSessionCapsaWorkerTest, FiringMakesAReporterAndBeginsTheCounti
   EXPECT_EQ(state().firedCount, 2);
 }
 
-TEST_F(TWReportingSessionCapsaWorkerTest, AnInstanceThatCannotFireGoesOnCounting) {
+TEST_F(TWReportingSessionCapsaWorkerTest, AnInstanceThatCannotFireContinuesToCount) {
   script_.canFire = false;
   fireAfter(1, -1.0);
   handle(1);
@@ -308,7 +309,7 @@ TEST_F(TWReportingSessionCapsaWorkerTest, AnInstanceThatCannotFireGoesOnCounting
   EXPECT_EQ(test.capsa.reporterCount(), 0U);
 }
 
-TEST_F(TWReportingSessionCapsaWorkerTest, OncePerSessionItFiresOnceAndThenGoesOnCounting) {
+TEST_F(TWReportingSessionCapsaWorkerTest, OncePerSessionItFiresOnceAndThenOnlyCounts) {
   fireAfter(1, -1.0);
   state().oncePerSession = true;
   handle(1);
@@ -335,7 +336,7 @@ TEST_F(TWReportingSessionCapsaWorkerTest, InASessionOfTheTestServiceTheFireIsSki
   EXPECT_EQ(test.capsa.reporterCount(), 1U);
 }
 
-TEST_F(TWReportingSessionCapsaWorkerTest, AnInstanceThatIgnoresARepeatLeavesItToTheOthers) {
+TEST_F(TWReportingSessionCapsaWorkerTest, ARepeatForOneInstanceStillCountsForTheOthers) {
   const auto made = TWReportingSessionCapsaWorker::initWithSession(session);
   const ValueMap payload{{"Haptic_Active_Hardware_Time_Seconds", 1}};
   made->addInstance(ScriptedInstance::kInstanceClass);
@@ -345,13 +346,13 @@ TEST_F(TWReportingSessionCapsaWorkerTest, AnInstanceThatIgnoresARepeatLeavesItTo
   EXPECT_EQ(stateOf(*made, "TWReportingCapsaWorkerInstanceHapticLeaks")->interestedCount, 1);
 }
 
-TEST_F(TWReportingSessionCapsaWorkerTest, AMessageAfterTheSessionIsGoneIsIgnored) {
+TEST_F(TWReportingSessionCapsaWorkerTest, AMessageAfterTheSessionHasEndedIsIgnored) {
   session.reset();
   handle(1);
   EXPECT_EQ(state().interestedCount, 0);
 }
 
-// Answers.
+// Answers of the capture service.
 
 class CapsaReplyTest : public CapsaTest {
  protected:
@@ -418,9 +419,9 @@ TEST_F(CapsaReplyTest, AReasonOutsideTheTableIsShownAsItsNumber) {
   EXPECT_THAT(errors(), IsEmpty());
 }
 
-// Signatures.
+// Signatures of captures.
 
-TEST_F(CapsaReplyTest, ASignatureSaysTheServiceTheMessagesKindAndTheProcess) {
+TEST_F(CapsaReplyTest, ASignatureNamesTheServiceTheMessagesCategoryAndTypeAndTheProcess) {
   const auto session = makeSessionOf(kServiceAlarms);
   const auto reporter = test.capsa.makeReporter();
   const TWReportingSessionMessage message({{"n", 1}}, 0x20000000 | kCategoryError, kTypeIssueDetector);

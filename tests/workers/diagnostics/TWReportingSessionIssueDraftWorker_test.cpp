@@ -28,14 +28,14 @@ class TWReportingSessionIssueDraftWorkerTest : public ReportingTest {
     test.clock.setNow(kNow);
   }
 
-  void switchOn(const Value& backOff = 3600) {
+  void enable(const Value& backOff = 3600) {
     makeInternalBuild();
     test.preferences.configure(kDomain, "VidroInvalidXyBackOffSeconds", backOff);
   }
   std::shared_ptr<TWReportingSessionIssueDraftWorker> makeWorker() {
     return TWReportingSessionIssueDraftWorker::initWithSession(session);
   }
-  // One that has settled since long ago.
+  // Makes a worker whose wait after the first message is over.
   std::shared_ptr<TWReportingSessionIssueDraftWorker> makeWatchingWorker() {
     auto worker = makeWorker();
     worker->handleMessage(*messageAt(1.0, {}));
@@ -56,7 +56,7 @@ TEST_F(TWReportingSessionIssueDraftWorkerTest, IsAConsumerAlsoInSingleMessageSes
   EXPECT_FALSE(workerClass.isProducer);
   EXPECT_FALSE(workerClass.startOnInit);
   EXPECT_TRUE(workerClass.handleSingleMessageSession);
-  switchOn();
+  enable();
   EXPECT_FALSE(makeWorker()->handleRedundantMessages());
 }
 
@@ -77,7 +77,7 @@ TEST_F(TWReportingSessionIssueDraftWorkerTest, OffInternalBuildsNoWorkerExists) 
 }
 
 TEST_F(TWReportingSessionIssueDraftWorkerTest, TheFirstMessageNeverTriggersEvenIfItIsTheError) {
-  switchOn();
+  enable();
   const auto worker = makeWorker();
   EXPECT_FALSE(worker->handleMessage(*errorAt(kNow)));
   EXPECT_EQ(drafts(), 0U);
@@ -85,19 +85,19 @@ TEST_F(TWReportingSessionIssueDraftWorkerTest, TheFirstMessageNeverTriggersEvenI
 }
 
 TEST_F(TWReportingSessionIssueDraftWorkerTest, AnErrorWithinFiveSecondsOfTheFirstMessageDoesNotTrigger) {
-  switchOn();
+  enable();
   const auto worker = makeWorker();
   worker->handleMessage(*messageAt(100.0, {}));
   worker->handleMessage(*errorAt(103.0));
-  worker->handleMessage(*errorAt(105.0));  // exactly at the end of it
+  worker->handleMessage(*errorAt(105.0));  // exactly at the end of the five seconds
   EXPECT_EQ(drafts(), 0U);
   EXPECT_EQ(lastRun(), std::nullopt);
   worker->handleMessage(*errorAt(105.25));
   EXPECT_EQ(drafts(), 1U);
 }
 
-TEST_F(TWReportingSessionIssueDraftWorkerTest, AMessageOfNoTimeLeavesTheSettlingToTheNextOne) {
-  switchOn();
+TEST_F(TWReportingSessionIssueDraftWorkerTest, AfterAMessageBefore1970TheNextOneBeginsTheWait) {
+  enable();
   const auto worker = makeWorker();
   worker->handleMessage(*messageAt(-100.0, {}));
   worker->handleMessage(*errorAt(kNow));
@@ -107,7 +107,7 @@ TEST_F(TWReportingSessionIssueDraftWorkerTest, AMessageOfNoTimeLeavesTheSettling
 }
 
 TEST_F(TWReportingSessionIssueDraftWorkerTest, ATimeThatIsNoNumberNeverTriggers) {
-  switchOn();
+  enable();
   const double nan = std::numeric_limits<double>::quiet_NaN();
   makeWatchingWorker()->handleMessage(*errorAt(nan));
   const auto worker = makeWorker();
@@ -117,15 +117,15 @@ TEST_F(TWReportingSessionIssueDraftWorkerTest, ATimeThatIsNoNumberNeverTriggers)
 }
 
 TEST_F(TWReportingSessionIssueDraftWorkerTest, OtherMessagesNeitherTriggerNorClaimThePeriod) {
-  switchOn();
+  enable();
   const auto worker = makeWatchingWorker();
   worker->handleMessage(*messageAt(kNow, {{"vdac_valid_x", 1}, {"x_vdac_invalid_", 1}}));
   EXPECT_EQ(drafts(), 0U);
   EXPECT_EQ(lastRun(), std::nullopt);
 }
 
-TEST_F(TWReportingSessionIssueDraftWorkerTest, TheDraftSaysWhatHappened) {
-  switchOn();
+TEST_F(TWReportingSessionIssueDraftWorkerTest, TheDraftDescribesTheError) {
+  enable();
   session->setClientProcessName("callapp");
   const auto worker = makeWatchingWorker();
   test.log.clear();
@@ -150,15 +150,15 @@ TEST_F(TWReportingSessionIssueDraftWorkerTest, TheDraftSaysWhatHappened) {
               ElementsAre("Starting issue draft for VidroXYerrorMessage reporterID=77"));
 }
 
-TEST_F(TWReportingSessionIssueDraftWorkerTest, TheComponentsIdentifierIsThatOfTheConfiguration) {
-  switchOn();
+TEST_F(TWReportingSessionIssueDraftWorkerTest, TheComponentsIdentifierComesFromTheConfiguration) {
+  enable();
   test.preferences.configure(kDomain, "VidroComponentIdentifier", 4711);
   makeWatchingWorker()->handleMessage(*errorAt(kNow));
   EXPECT_EQ(test.issueDrafts.requests().at(0).draft.component.identifier, 4711);
 }
 
 TEST_F(TWReportingSessionIssueDraftWorkerTest, AfterTheSessionsEndTheDraftNamesNoProcess) {
-  switchOn();
+  enable();
   session->setClientProcessName("callapp");
   const auto worker = makeWatchingWorker();
   session.reset();
@@ -166,8 +166,8 @@ TEST_F(TWReportingSessionIssueDraftWorkerTest, AfterTheSessionsEndTheDraftNamesN
   EXPECT_EQ(test.issueDrafts.requests().at(0).processName, std::nullopt);
 }
 
-TEST_F(TWReportingSessionIssueDraftWorkerTest, ASuccessIsSaid) {
-  switchOn();
+TEST_F(TWReportingSessionIssueDraftWorkerTest, ASuccessIsLogged) {
+  enable();
   makeWatchingWorker()->handleMessage(*errorAt(kNow));
   test.log.clear();
   ASSERT_TRUE(test.issueDrafts.answerNext());
@@ -176,14 +176,14 @@ TEST_F(TWReportingSessionIssueDraftWorkerTest, ASuccessIsSaid) {
 }
 
 TEST_F(TWReportingSessionIssueDraftWorkerTest, ARefusalIsAnErrorLineWithItsReason) {
-  switchOn();
+  enable();
   makeWatchingWorker()->handleMessage(*errorAt(kNow));
   ASSERT_TRUE(test.issueDrafts.answerNext("no room left"));
   EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kError), ElementsAre("Error creating draft - no room left"));
 }
 
 TEST_F(TWReportingSessionIssueDraftWorkerTest, AnAnswerAfterTheDaemonsEndIsStillLogged) {
-  switchOn();
+  enable();
   makeWatchingWorker()->handleMessage(*errorAt(kNow));
   session.reset();
   context.reset();
@@ -192,8 +192,8 @@ TEST_F(TWReportingSessionIssueDraftWorkerTest, AnAnswerAfterTheDaemonsEndIsStill
   EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kError), ElementsAre("Error creating draft - too late"));
 }
 
-TEST_F(TWReportingSessionIssueDraftWorkerTest, WithoutAnAnswerSessionsGoOnAndEnd) {
-  switchOn();
+TEST_F(TWReportingSessionIssueDraftWorkerTest, WithoutAnAnswerSessionsContinueAndEnd) {
+  enable();
   session->start();
   session->sendMessage(messageAt(kNow, {{"a", 1}}));
   session->sendMessage(errorAt(kNow + 10));
@@ -204,7 +204,7 @@ TEST_F(TWReportingSessionIssueDraftWorkerTest, WithoutAnAnswerSessionsGoOnAndEnd
 }
 
 TEST_F(TWReportingSessionIssueDraftWorkerTest, TwoSessionsAnHourApartDraftOnceEachTwoWithinTheHourOnce) {
-  switchOn(3600);
+  enable(3600);
   makeWatchingWorker()->handleMessage(*errorAt(kNow));
   EXPECT_EQ(drafts(), 1U);
   test.clock.setNow(kNow + 3599.0);
@@ -215,8 +215,8 @@ TEST_F(TWReportingSessionIssueDraftWorkerTest, TwoSessionsAnHourApartDraftOnceEa
   EXPECT_EQ(drafts(), 2U);
 }
 
-TEST_F(TWReportingSessionIssueDraftWorkerTest, AskingClaimsThePeriodWhoeverDrafts) {
-  switchOn();
+TEST_F(TWReportingSessionIssueDraftWorkerTest, AskingUsesThePeriodAlsoWithoutADraft) {
+  enable();
   const auto worker = makeWatchingWorker();
   EXPECT_TRUE(worker->interestedInMessage(*errorAt(kNow)));
   EXPECT_EQ(lastRun(), Value(kNow));
@@ -225,8 +225,8 @@ TEST_F(TWReportingSessionIssueDraftWorkerTest, AskingClaimsThePeriodWhoeverDraft
   EXPECT_EQ(drafts(), 0U);
 }
 
-TEST_F(TWReportingSessionIssueDraftWorkerTest, TheCheckSaysWhatItFoundAndWhatItKept) {
-  switchOn();
+TEST_F(TWReportingSessionIssueDraftWorkerTest, TheCheckLogsItsResultAndStoresTheTime) {
+  enable();
   const auto worker = makeWorker();
   test.log.clear();
   EXPECT_FALSE(worker->hasRunInTimeframe(60, "some_key"));
@@ -238,15 +238,15 @@ TEST_F(TWReportingSessionIssueDraftWorkerTest, TheCheckSaysWhatItFoundAndWhatItK
   EXPECT_EQ(test.preferences.read(kDomain, "some_key"), Value(kNow));
 }
 
-TEST_F(TWReportingSessionIssueDraftWorkerTest, OtherKeysOfTheDomainOutliveTheCheck) {
-  switchOn();
+TEST_F(TWReportingSessionIssueDraftWorkerTest, TheCheckKeepsTheOtherKeysOfTheDomain) {
+  enable();
   ASSERT_FALSE(test.preferences.write(kDomain, "other", "kept"));
   makeWatchingWorker()->handleMessage(*errorAt(kNow));
   EXPECT_EQ(test.preferences.read(kDomain, "other"), Value("kept"));
 }
 
-TEST_F(TWReportingSessionIssueDraftWorkerTest, ATimeThatCannotBeKeptIsAnErrorLineAndNoObstacle) {
-  switchOn();
+TEST_F(TWReportingSessionIssueDraftWorkerTest, ATimeThatCannotBeStoredIsLoggedAndTheDraftIsMade) {
+  enable();
   test.preferences.failWrites(std::errc::no_space_on_device);
   makeWatchingWorker()->handleMessage(*errorAt(kNow));
   EXPECT_EQ(drafts(), 1U);
@@ -255,7 +255,7 @@ TEST_F(TWReportingSessionIssueDraftWorkerTest, ATimeThatCannotBeKeptIsAnErrorLin
 }
 
 TEST_F(TWReportingSessionIssueDraftWorkerTest, ALastRunInTheFutureBlocksUntilTheClockHasCaughtUp) {
-  switchOn(60);
+  enable(60);
   ASSERT_FALSE(test.preferences.write(kDomain, kLastRun, kNow + 1000));
   makeWatchingWorker()->handleMessage(*errorAt(kNow));
   EXPECT_EQ(drafts(), 0U);
@@ -264,8 +264,8 @@ TEST_F(TWReportingSessionIssueDraftWorkerTest, ALastRunInTheFutureBlocksUntilThe
   EXPECT_EQ(drafts(), 1U);
 }
 
-TEST_F(TWReportingSessionIssueDraftWorkerTest, ASecondErrorAfterTheBackOffInTheSameSessionOnlySaysSo) {
-  switchOn(60);
+TEST_F(TWReportingSessionIssueDraftWorkerTest, ASecondErrorAfterTheBackOffInTheSameSessionIsOnlyLogged) {
+  enable(60);
   const auto worker = makeWatchingWorker();
   worker->handleMessage(*errorAt(kNow));
   test.clock.setNow(kNow + 61);
@@ -275,11 +275,11 @@ TEST_F(TWReportingSessionIssueDraftWorkerTest, ASecondErrorAfterTheBackOffInTheS
   EXPECT_THAT(test.log.textsOf("twrr"),
               ElementsAre(StartsWith("Issue draft has not run."),
                           "Issue draft has already run for VidroXYerrorMessage reporterID=77"));
-  EXPECT_EQ(lastRun(), Value(kNow + 61));  // the check has stamped the time all the same
+  EXPECT_EQ(lastRun(), Value(kNow + 61));  // the check has stored the time nevertheless
 }
 
 TEST_F(TWReportingSessionIssueDraftWorkerTest, AStoppedSessionMayDraftAgainAfterTheBackOff) {
-  switchOn(60);
+  enable(60);
   const auto worker = makeWatchingWorker();
   worker->handleMessage(*errorAt(kNow));
   test.log.clear();
@@ -292,7 +292,7 @@ TEST_F(TWReportingSessionIssueDraftWorkerTest, AStoppedSessionMayDraftAgainAfter
 }
 
 TEST_F(TWReportingSessionIssueDraftWorkerTest, ABackOffThatIsNoNumberIsNoBackOff) {
-  switchOn("soon");
+  enable("soon");
   makeWatchingWorker()->handleMessage(*errorAt(kNow));
   makeWatchingWorker()->handleMessage(*errorAt(kNow));
   EXPECT_EQ(drafts(), 2U);

@@ -47,7 +47,7 @@ class TWReportingSessionMemoryLogWorkerTest : public ReportingTest {
       return result;
     });
   }
-  // The commands run so far, in no order.
+  // Returns the commands run so far, sorted.
   std::vector<std::string> commands() const {
     std::vector<std::string> commands;
     for (const auto& run : test.commands.runs()) commands.push_back(run.command);
@@ -100,7 +100,7 @@ TEST_F(TWReportingSessionMemoryLogWorkerTest, ElsewhereOtherSessionsHaveNone) {
   EXPECT_EQ(session->workerInstanceCount(), 0U);
 }
 
-TEST_F(TWReportingSessionMemoryLogWorkerTest, AMemoryLogMessageLogsWhatBothToolsSayTheSecondFirst) {
+TEST_F(TWReportingSessionMemoryLogWorkerTest, AMemoryLogMessageLogsTheOutputOfBothToolsTheSecondFirst) {
   EXPECT_FALSE(handle());
   EXPECT_THAT(errors(),
               UnorderedElementsAre(
@@ -109,10 +109,10 @@ TEST_F(TWReportingSessionMemoryLogWorkerTest, AMemoryLogMessageLogsWhatBothTools
                   "WIRED LOG BLOCK 1\nslabs\n", "WIRED LOG BLOCK 1\nwiredlog: RESOURCE of all\n"));
   EXPECT_THAT(blocks(),
               ElementsAre("WIRED LOG BLOCK 1\nslabs\n", "WIRED LOG BLOCK 1\nwiredlog: RESOURCE of all\n"));
-  EXPECT_THAT(test.log.lines(), SizeIs(6));  // errors all
+  EXPECT_THAT(test.log.lines(), SizeIs(6));  // all of them errors
 }
 
-TEST_F(TWReportingSessionMemoryLogWorkerTest, MessagesOfOtherTypesDoNothingAndLeaveTheLimiterAlone) {
+TEST_F(TWReportingSessionMemoryLogWorkerTest, MessagesOfOtherTypesDoNothingAndDoNotUseTheLimit) {
   for (const int type : {0, 6, 18, 20, 65535}) EXPECT_FALSE(handle(static_cast<AudioEventType>(type)));
   EXPECT_THAT(commands(), IsEmpty());
   handle();
@@ -145,7 +145,7 @@ TEST_F(TWReportingSessionMemoryLogWorkerTest, ExactlyFiveSecondsLaterIsTooEarly)
   EXPECT_THAT(commands(), SizeIs(4));
 }
 
-TEST_F(TWReportingSessionMemoryLogWorkerTest, AMessageThatCameTooEarlyDoesNotPutTheNextOneOff) {
+TEST_F(TWReportingSessionMemoryLogWorkerTest, AMessageThatComesTooEarlyDoesNotDelayTheNextOne) {
   handle();
   test.clock.advance(4.0);
   handle();
@@ -163,7 +163,7 @@ TEST_F(TWReportingSessionMemoryLogWorkerTest, TheLimitHoldsForAllSessionsTogethe
   other->sendMessage(message({{"a", 1}}, 1, kMemoryLog));
   EXPECT_THAT(commands(), SizeIs(2));
   test.clock.advance(3.0);
-  other->sendMessage(message({{"a", 1}}, 1, kMemoryLog));  // redundant, and wanted
+  other->sendMessage(message({{"a", 1}}, 1, kMemoryLog));  // redundant, but the worker handles it
   EXPECT_THAT(commands(), SizeIs(4));
 }
 
@@ -185,26 +185,26 @@ TEST_F(TWReportingSessionMemoryLogWorkerTest, BothToolsRunAtOnceAndTheHandlerWai
   test.commands.hold("slabtop --once");
   test.commands.hold("tw-memory-usage");
   auto handled = handleOnAnotherThread();
-  test.commands.awaitRuns(2);  // neither waited for the other
+  test.commands.awaitRuns(2);  // neither waits for the other
   test.commands.release("tw-memory-usage");
-  EXPECT_THAT(blocks(), IsEmpty());  // the second tool's result comes first
+  EXPECT_THAT(blocks(), IsEmpty());  // the second tool's output must come first
   EXPECT_NE(handled.wait_for(std::chrono::seconds(0)), std::future_status::ready);
   test.commands.release("slabtop --once");
   EXPECT_FALSE(handled.get());
   EXPECT_THAT(blocks(), SizeIs(2));
 }
 
-TEST_F(TWReportingSessionMemoryLogWorkerTest, TheLimiterIsFreeWhileTheToolsRun) {
+TEST_F(TWReportingSessionMemoryLogWorkerTest, TheLimiterIsNotLockedWhileTheToolsRun) {
   test.commands.hold("slabtop --once");
   auto handled = handleOnAnotherThread();
   test.commands.awaitRuns(2);
-  EXPECT_FALSE(handle());  // would wait for ever at a limiter that is held
+  EXPECT_FALSE(handle());  // would never return if the limiter stayed locked
   test.commands.release("slabtop --once");
   handled.get();
   EXPECT_THAT(commands(), SizeIs(2));
 }
 
-TEST_F(TWReportingSessionMemoryLogWorkerTest, AToolThatCannotBeStartedIsUnableAndHasNoBlocks) {
+TEST_F(TWReportingSessionMemoryLogWorkerTest, AToolThatCannotBeStartedIsLoggedAndHasNoBlocks) {
   test.preferences.configure(kDomain, "memory_tools", ValueArray{"/nowhere/tool", "slabtop --once"});
   handle();
   EXPECT_THAT(errors(), Contains("wiredlog: unable to execute '/nowhere/tool'"));
@@ -222,7 +222,7 @@ TEST_F(TWReportingSessionMemoryLogWorkerTest, APreferenceNamesOtherToolsTheFirst
               ElementsAre("WIRED LOG BLOCK 1\nnoise\n", "WIRED LOG BLOCK 1\nwiredlog:  wired_mem 1\n"));
 }
 
-TEST_F(TWReportingSessionMemoryLogWorkerTest, APreferenceThatNamesNoTwoToolsIsSaidAndIgnored) {
+TEST_F(TWReportingSessionMemoryLogWorkerTest, APreferenceThatDoesNotNameTwoToolsIsLoggedAndIgnored) {
   const std::vector<Value> wrong{"one", ValueArray{"one"}, ValueArray{"one", "two", "three"},
                                  ValueArray{"one", 2}, ValueArray{1, "two"}};
   for (const Value& value : wrong) {
@@ -235,7 +235,7 @@ TEST_F(TWReportingSessionMemoryLogWorkerTest, APreferenceThatNamesNoTwoToolsIsSa
   }
 }
 
-TEST_F(TWReportingSessionMemoryLogWorkerTest, WithoutAThreadForTheFirstToStartNothingIsRun) {
+TEST_F(TWReportingSessionMemoryLogWorkerTest, WithoutAThreadForTheToolThatStartsFirstNothingIsRun) {
   test.threads.refuse("twr-memory-1", std::errc::resource_unavailable_try_again);
   EXPECT_FALSE(handle());
   EXPECT_THAT(errors(),
@@ -243,7 +243,7 @@ TEST_F(TWReportingSessionMemoryLogWorkerTest, WithoutAThreadForTheFirstToStartNo
   EXPECT_THAT(commands(), IsEmpty());
 }
 
-TEST_F(TWReportingSessionMemoryLogWorkerTest, WithoutAThreadForTheOtherTheRunningOneIsWaitedFor) {
+TEST_F(TWReportingSessionMemoryLogWorkerTest, WithoutAThreadForTheOtherToolItWaitsForTheRunningOne) {
   test.threads.refuse("twr-memory-0", std::errc::resource_unavailable_try_again);
   EXPECT_FALSE(handle());
   EXPECT_THAT(
@@ -257,7 +257,7 @@ TEST_F(TWReportingSessionMemoryLogWorkerTest, AnEmptyTextIsNoBlock) { EXPECT_THA
 TEST_F(TWReportingSessionMemoryLogWorkerTest, FifteenHundredBytesInLinesOfAHundredEndOnLines) {
   std::string text;
   for (int line = 0; line < 15; ++line) text += std::string(99, static_cast<char>('a' + line)) + "\n";
-  // The first line end at or after byte 512 is that of byte 599.
+  // The first line end at or after byte 512 is byte 599.
   EXPECT_THAT(blocksOf(text), ElementsAre("WIRED LOG BLOCK 1\n" + text.substr(0, 600),
                                           "WIRED LOG BLOCK 2\n" + text.substr(600, 600),
                                           "WIRED LOG BLOCK 3\n" + text.substr(1200)));
@@ -269,7 +269,7 @@ TEST_F(TWReportingSessionMemoryLogWorkerTest, ALineEndAtByte512IsTheBlocksEnd) {
               ElementsAre("WIRED LOG BLOCK 1\n" + text.substr(0, 513), "WIRED LOG BLOCK 2\nrest"));
 }
 
-TEST_F(TWReportingSessionMemoryLogWorkerTest, ALineEndBeforeByte512IsNot) {
+TEST_F(TWReportingSessionMemoryLogWorkerTest, ALineEndBeforeByte512IsNotTheBlocksEnd) {
   const std::string text = std::string(511, 'x') + "\n" + std::string(100, 'y') + "\nz";
   EXPECT_THAT(blocksOf(text),
               ElementsAre("WIRED LOG BLOCK 1\n" + text.substr(0, 613), "WIRED LOG BLOCK 2\nz"));
@@ -302,7 +302,7 @@ TEST_F(TWReportingSessionMemoryLogWorkerTest, Exactly512BytesAreOneBlock) {
   EXPECT_THAT(blocksOf(text), ElementsAre("WIRED LOG BLOCK 1\n" + text));
 }
 
-TEST_F(TWReportingSessionMemoryLogWorkerTest, LinesCarryTheirSourcesNames) {
+TEST_F(TWReportingSessionMemoryLogWorkerTest, LogLinesNameTheirSource) {
   handle();
   for (const auto& line : test.log.linesOf("twrr")) {
     EXPECT_THAT(line.message, ::testing::AnyOf(StartsWith("TWReportingSessionMemoryLogWorker:"),
@@ -310,17 +310,17 @@ TEST_F(TWReportingSessionMemoryLogWorkerTest, LinesCarryTheirSourcesNames) {
   }
 }
 
-// Hears nothing until it was asked about a first line.
+// Disables its first line and writes all later ones.
 class LateLog final : public Log {
  public:
-  bool isEnabled(std::string_view, LogLevel) const override { return std::exchange(isListening_, true); }
+  bool isEnabled(std::string_view, LogLevel) const override { return std::exchange(isEnabled_, true); }
   void write(std::string_view, std::string_view, LogLevel, std::string_view message) override {
     lines.push_back(MemoryLog::withoutPrefix(message));
   }
   std::vector<std::string> lines;
 
  private:
-  mutable bool isListening_ = false;
+  mutable bool isEnabled_ = false;
 };
 
 TEST(MemoryLogNumbering, ABlockThatIsNotWrittenHasNoNumber) {

@@ -46,7 +46,7 @@ class TWReportingSessionTraceWorkerTest : public ReportingTest {
 
   TWReportingSessionWorkerProtocol& worker() { return *session->messageWorkers().at(0); }
   std::vector<std::string> errors() const { return test.log.textsOf("twrt", LogLevel::kError); }
-  // The lines at any level.
+  // Returns the log lines of all levels.
   std::vector<std::string> lines() const { return test.log.textsOf("twrt"); }
   std::chrono::nanoseconds elapsed() const { return test.clock.monotonic(); }
   std::string benchfile(const std::string& path = kFile) const {
@@ -64,7 +64,7 @@ TEST_F(TWReportingSessionTraceWorkerTest, IsNeitherProducerNorConsumer) {
   EXPECT_FALSE(workerClass.handleSingleMessageSession);
 }
 
-TEST_F(TWReportingSessionTraceWorkerTest, TracesATestSessionAndLeavesItsIntervalsInMilliseconds) {
+TEST_F(TWReportingSessionTraceWorkerTest, TracesATestSessionAndWritesItsIntervalsInMilliseconds) {
   session->start();
   EXPECT_TRUE(worker().started);
   EXPECT_EQ(test.runtrace.record(0).starts, 1);
@@ -76,7 +76,7 @@ TEST_F(TWReportingSessionTraceWorkerTest, TracesATestSessionAndLeavesItsInterval
   EXPECT_THAT(errors(), IsEmpty());
 }
 
-TEST_F(TWReportingSessionTraceWorkerTest, TracesTheProbeListWithoutPackingTheTrace) {
+TEST_F(TWReportingSessionTraceWorkerTest, TracesTheProbeListWithoutCompressingTheTrace) {
   session->start();
   EXPECT_EQ(test.runtrace.record(0).configuration.probeListPath, kProbes);
   EXPECT_FALSE(test.runtrace.record(0).configuration.compressesFinishedTrace);
@@ -128,7 +128,7 @@ TEST_F(TWReportingSessionTraceWorkerTest, AConfigurationWithoutAProbeFileIsLikeA
                                     "a valid path"));
 }
 
-TEST_F(TWReportingSessionTraceWorkerTest, AWorkerThatWasLeftOutMayTraceAtALaterStart) {
+TEST_F(TWReportingSessionTraceWorkerTest, AWorkerThatDidNotStartMayTraceAtALaterStart) {
   configure({{"TWReportingKolviPlistFilePath", "/etc/none.json"}});
   session->start();
   session->stop();
@@ -162,12 +162,12 @@ TEST_F(TWReportingSessionTraceWorkerTest, AStartThatNeverComesMakesNoFile) {
   session->start();
   session->stop();
   EXPECT_THAT(errors(), ElementsAre(kStartTimeout));
-  EXPECT_EQ(test.runtrace.record(0).stops, 1);  // the one after the time-out
+  EXPECT_EQ(test.runtrace.record(0).stops, 1);  // the stop after the timeout
   EXPECT_EQ(benchfile(), "no file");
 }
 
 TEST_F(TWReportingSessionTraceWorkerTest, ATraceThatIsNoLongerValidIsNotStoppedAfterTheTimeOut) {
-  // A failed stop nobody asked for drops the trace session and signals nothing.
+  // A stop that fails without a request drops the trace session and signals nothing.
   test.runtrace.onStart({Runtrace::didStop("gone").after(1s)});
   session->start();
   EXPECT_EQ(elapsed(), 15s);
@@ -253,7 +253,7 @@ TEST_F(TWReportingSessionTraceWorkerTest, TheStopCallbackAloneDoesNotEndTheWait)
   EXPECT_THAT(test.log.textsOf("twrt", LogLevel::kInfo), SizeIs(2));
 }
 
-TEST_F(TWReportingSessionTraceWorkerTest, AFailedStopIsLoggedAndWaitsForTheCompletionAllTheSame) {
+TEST_F(TWReportingSessionTraceWorkerTest, AFailedStopIsLoggedAndStillWaitsForTheCompletion) {
   test.runtrace.onStop({Runtrace::didStop("disk full")});
   session->start();
   session->stop();
@@ -283,7 +283,7 @@ TEST_F(TWReportingSessionTraceWorkerTest, ATraceThatEndsByItselfHasNothingToStop
   EXPECT_THAT(errors(), ElementsAre("runtraceDidComplete the session daemon ended"));
 }
 
-TEST_F(TWReportingSessionTraceWorkerTest, ASecondCompletionIsNotHeard) {
+TEST_F(TWReportingSessionTraceWorkerTest, ASecondCompletionIsIgnored) {
   test.runtrace.onStop({Runtrace::didComplete(kTrace), Runtrace::didComplete("/traces/2")});
   session->start();
   session->stop();
@@ -296,7 +296,7 @@ TEST_F(TWReportingSessionTraceWorkerTest, TheFinishedTraceIsKeptNoLongerThanItIs
   EXPECT_TRUE(test.runtrace.callBack(0, Runtrace::didComplete(kTrace)));
   EXPECT_FALSE(test.runtrace.record(0).token.expired());
   session->stop();
-  session->start();  // in place of the one that ended by itself
+  session->start();  // replaces the run that ended by itself
   EXPECT_TRUE(test.runtrace.record(0).token.expired());
   session->stop();
   EXPECT_NE(benchfile(), "no file");
@@ -316,8 +316,8 @@ TEST_F(TWReportingSessionTraceWorkerTest, ASessionStartedAgainTracesAgain) {
             "TWReporting 4\ndecode 3\n");
 }
 
-// A completion of the run before must not stand in for the one that is waited for.
-TEST_F(TWReportingSessionTraceWorkerTest, WhatAnEarlierRunIsToldTooLateDoesNotTouchThisOne) {
+// The worker must not take the completion of an earlier run for the one that it waits for.
+TEST_F(TWReportingSessionTraceWorkerTest, ALateCallbackOfAnEarlierRunDoesNotChangeThisOne) {
   test.runtrace.onStop({});
   session->start();
   session->stop();
@@ -330,7 +330,7 @@ TEST_F(TWReportingSessionTraceWorkerTest, WhatAnEarlierRunIsToldTooLateDoesNotTo
   EXPECT_THAT(test.kolvi.opened, ElementsAre(kTrace));
 }
 
-TEST_F(TWReportingSessionTraceWorkerTest, ACallbackAfterTheWorkerIsGoneReachesNobody) {
+TEST_F(TWReportingSessionTraceWorkerTest, ACallbackAfterTheWorkerHasEndedDoesNothing) {
   session->start();
   session.reset();
   EXPECT_FALSE(test.runtrace.record(0).isAlive);
@@ -339,7 +339,7 @@ TEST_F(TWReportingSessionTraceWorkerTest, ACallbackAfterTheWorkerIsGoneReachesNo
   EXPECT_THAT(lines(), IsEmpty());
 }
 
-TEST_F(TWReportingSessionTraceWorkerTest, AServiceTypeThatChangesMeanwhileLeavesTheTraceUnprocessed) {
+TEST_F(TWReportingSessionTraceWorkerTest, AServiceTypeThatChangesDuringTheTraceLeavesItUnprocessed) {
   session->start();
   session->setServiceType(7);
   session->stop();
@@ -349,7 +349,7 @@ TEST_F(TWReportingSessionTraceWorkerTest, AServiceTypeThatChangesMeanwhileLeaves
 
 // Processing the trace.
 
-TEST_F(TWReportingSessionTraceWorkerTest, LogsWhatItDoes) {
+TEST_F(TWReportingSessionTraceWorkerTest, LogsItsSteps) {
   session->start();
   session->stop();
   EXPECT_THAT(
@@ -363,7 +363,7 @@ TEST_F(TWReportingSessionTraceWorkerTest, LogsWhatItDoes) {
   EXPECT_THAT(test.log.textsOf("twrt", LogLevel::kDebug), SizeIs(6));
 }
 
-TEST_F(TWReportingSessionTraceWorkerTest, ATraceThatIsNotThereEndsTheProcessing) {
+TEST_F(TWReportingSessionTraceWorkerTest, AMissingTraceEndsTheProcessing) {
   test.runtrace.onStop({Runtrace::didComplete("/traces/none")});
   session->start();
   session->stop();
@@ -405,7 +405,7 @@ TEST_F(TWReportingSessionTraceWorkerTest, AnyOtherRootIsUnsupported) {
   EXPECT_THAT(test.kolvi.opened, IsEmpty());
 }
 
-TEST_F(TWReportingSessionTraceWorkerTest, AProbeListThatHoldsNothingOrIsNoJsonEndsTheProcessing) {
+TEST_F(TWReportingSessionTraceWorkerTest, AProbeListThatIsEmptyOrNotJsonEndsTheProcessing) {
   for (const char* text : {"[]", "", "{", "null"}) {
     test.log.clear();
     useProbes(text);
@@ -434,9 +434,9 @@ TEST_F(TWReportingSessionTraceWorkerTest, ATraceThatDoesNotOpenEndsTheProcessing
   EXPECT_EQ(benchfile(), "no file");
 }
 
-// The file.
+// The benchmark data file.
 
-TEST_F(TWReportingSessionTraceWorkerTest, MakesItsDirectoryForEverybody) {
+TEST_F(TWReportingSessionTraceWorkerTest, MakesItsDirectoryWritableForEveryUser) {
   session->start();
   session->stop();
   EXPECT_EQ(test.files.directoryMode("/logs/Audio/Traces"), 0777U);
@@ -457,7 +457,7 @@ TEST_F(TWReportingSessionTraceWorkerTest, TheConfigurationChoosesTheFilesNameAnd
   EXPECT_EQ(test.files.directoryMode("/logs/Audio/Traces"), std::nullopt);
 }
 
-TEST_F(TWReportingSessionTraceWorkerTest, ADirectoryThatCannotBeMadeIsLoggedAndTheFileTriedAllTheSame) {
+TEST_F(TWReportingSessionTraceWorkerTest, ADirectoryThatCannotBeMadeIsLoggedAndTheFileIsStillTried) {
   test.files.failCreateDirectories(std::errc::permission_denied);
   session->start();
   session->stop();
@@ -466,7 +466,7 @@ TEST_F(TWReportingSessionTraceWorkerTest, ADirectoryThatCannotBeMadeIsLoggedAndT
                                     "Failed to move file"));
 }
 
-TEST_F(TWReportingSessionTraceWorkerTest, AFileThatStandsInTheWayIsAFailureToMove) {
+TEST_F(TWReportingSessionTraceWorkerTest, AnExistingFileIsAFailureToMove) {
   test.files.addFile(kFile, "earlier");
   session->start();
   session->stop();
