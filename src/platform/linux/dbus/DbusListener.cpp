@@ -23,14 +23,14 @@ DbusListener::DbusListener(DbusNames names, const RequestSet& methods, std::stri
 DbusListener::~DbusListener() { shutDown(); }
 
 void DbusListener::resume() {
-  const std::lock_guard lock(lifeMutex_);
+  const MutexLock lock(lifeMutex_);
   assert(delegate_ != nullptr);
   if (thread_.joinable() || isStopping_) return;
   thread_ = std::thread([this] { run(); });
 }
 
 void DbusListener::shutDown() {
-  const std::lock_guard lock(lifeMutex_);
+  const MutexLock lock(lifeMutex_);
   isStopping_ = true;
   waker_->wake(0);
   if (thread_.joinable()) thread_.join();

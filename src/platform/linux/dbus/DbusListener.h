@@ -4,7 +4,6 @@
 #include <atomic>
 #include <chrono>
 #include <memory>
-#include <mutex>
 #include <optional>
 #include <string>
 #include <thread>
@@ -15,6 +14,7 @@
 #include "platform/linux/dbus/DbusService.h"
 #include "platform/linux/threads/IoWaker.h"
 #include "values/GrowingDelay.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -59,9 +59,9 @@ class DbusListener final : public MessagingListener {
   GrowingDelay pause_{kFirstPause, kLongestPause};
   std::optional<DbusService::End> lastEnd_;
 
-  std::mutex lifeMutex_;  // of resume() and shutDown()
+  Mutex lifeMutex_;  // held by resume() and shutDown()
   std::atomic<bool> isStopping_ = false;
-  std::thread thread_;
+  std::thread thread_ GUARDED_BY(lifeMutex_);
 };
 
 // The bus that the environment names: the session's, else the system's (empty).

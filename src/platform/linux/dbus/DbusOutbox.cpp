@@ -15,7 +15,7 @@ std::size_t bytesOf(const DbusOutcome& outcome) {
 
 void DbusOutbox::add(DbusOutcome outcome) {
   {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     if (isClosed_) return;
     unsentBytes_ += bytesOf(outcome);
     unsent_.push_back(std::move(outcome));
@@ -27,7 +27,7 @@ void DbusOutbox::add(DbusOutcome outcome) {
 
 void DbusOutbox::endOfBatch() {
   {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     isPutOff_ = false;
     if (isClosed_) return;
   }
@@ -35,7 +35,7 @@ void DbusOutbox::endOfBatch() {
 }
 
 std::optional<DbusOutcome> DbusOutbox::next() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   if (unsent_.empty()) return std::nullopt;
   DbusOutcome outcome = std::move(unsent_.front());
   unsent_.pop_front();
@@ -44,7 +44,7 @@ std::optional<DbusOutcome> DbusOutbox::next() {
 }
 
 void DbusOutbox::close() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   isClosed_ = true;
   unsent_.clear();
   unsentBytes_ = 0;

@@ -6,12 +6,12 @@
 #include <cstdint>
 #include <deque>
 #include <memory>
-#include <mutex>
 #include <optional>
 
 #include "platform/RequestHandler.h"
 #include "platform/linux/threads/BatchScope.h"
 #include "platform/linux/threads/IoWaker.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -46,11 +46,10 @@ class DbusOutbox final : public BatchScope::Deferred, public std::enable_shared_
   const std::shared_ptr<IoWaker> waker_;
   const std::uint64_t client_;
   std::atomic<std::size_t> unsentBytes_{0};
-  std::mutex mutex_;
-  // Under mutex_.
-  std::deque<DbusOutcome> unsent_;
-  bool isClosed_ = false;
-  bool isPutOff_ = false;  // the waking, to the end of a batch
+  Mutex mutex_;
+  std::deque<DbusOutcome> unsent_ GUARDED_BY(mutex_);
+  bool isClosed_ GUARDED_BY(mutex_) = false;
+  bool isPutOff_ GUARDED_BY(mutex_) = false;  // the waking, to the end of a batch
 };
 
 // The way back to one call. Only the first answer goes out: a call on the bus has one. When it is destroyed

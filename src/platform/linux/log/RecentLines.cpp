@@ -11,7 +11,7 @@ void RecentLines::add(std::string_view line) {
   if (!line.empty() && line.back() == '\n') line.remove_suffix(1);
   std::string kept(shortened(line, limits_.lineBytes - 1));
   kept += '\n';
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   bytes_ += kept.size();
   lines_.push_back(std::move(kept));
   while (lines_.size() > limits_.lines || bytes_ > limits_.bytes) {
@@ -21,7 +21,7 @@ void RecentLines::add(std::string_view line) {
 }
 
 std::string RecentLines::text() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   std::string text;
   text.reserve(bytes_);
   for (const std::string& line : lines_) text += line;

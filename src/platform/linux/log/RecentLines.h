@@ -3,9 +3,10 @@
 
 #include <cstddef>
 #include <deque>
-#include <mutex>
 #include <string>
 #include <string_view>
+
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -29,9 +30,9 @@ class RecentLines {
 
  private:
   const Limits limits_;
-  mutable std::mutex mutex_;  // guards the two below
-  std::deque<std::string> lines_;
-  std::size_t bytes_ = 0;
+  mutable Mutex mutex_;
+  std::deque<std::string> lines_ GUARDED_BY(mutex_);
+  std::size_t bytes_ GUARDED_BY(mutex_) = 0;
 };
 
 }  // namespace tonewerk

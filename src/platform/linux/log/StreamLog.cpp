@@ -67,7 +67,7 @@ std::string StreamLog::format(double at, std::string_view category, LogLevel lev
 
 void StreamLog::write(std::string_view, std::string_view category, LogLevel level, std::string_view message) {
   const std::string line = format(clock_.now(), category, level, message);
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   writeAll(fileDescriptor_, line);
 }
 

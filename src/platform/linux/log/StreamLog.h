@@ -1,12 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <mutex>
 #include <string>
 
 #include "platform/Clock.h"
 #include "platform/Log.h"
 #include "platform/linux/log/LogThreshold.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -34,7 +34,7 @@ class StreamLog final : public Log {
   const int fileDescriptor_;
   const Clock& clock_;
   const LogThreshold threshold_;
-  std::mutex mutex_;  // held while a line is written, so that one written in pieces stays whole
+  Mutex mutex_;  // held while a line is written, so that one written in pieces stays whole
 };
 
 }  // namespace tonewerk

@@ -5,9 +5,10 @@
 #include <atomic>
 #include <fstream>
 #include <malloc.h>
-#include <mutex>
 #include <unistd.h>
 #include <utility>
+
+#include "values/Mutex.h"
 
 namespace tonewerk {
 namespace {
@@ -42,14 +43,14 @@ struct AllocatorReclaimer::Looks {
   TimerService& timers;
   const Allocator allocator;
   std::atomic<bool> isAskedFor = false;
-  std::mutex mutex;  // guards what follows
-  std::unique_ptr<Timer> timer;
-  int seconds = 0;  // since the looks began
+  Mutex mutex;
+  std::unique_ptr<Timer> timer GUARDED_BY(mutex);
+  int seconds GUARDED_BY(mutex) = 0;  // since the looks began
 
   Looks(TimerService& service, Allocator looked) : timers(service), allocator(std::move(looked)) {}
 
   void begin(const std::weak_ptr<Looks>& self) {
-    const std::lock_guard lock(mutex);
+    const MutexLock lock(mutex);
     if (timer != nullptr) return;
     timer = timers.repeat(kFirstLook, [self] {
       if (const auto looks = self.lock()) looks->tick();
@@ -61,7 +62,7 @@ struct AllocatorReclaimer::Looks {
   }
 
   bool isLookDue() {
-    const std::lock_guard lock(mutex);
+    const MutexLock lock(mutex);
     // Asked for again from now on means looks after those that are under way.
     if (seconds == 0) isAskedFor = false;
     const bool isDue = isPowerOfTwo(++seconds);
@@ -76,7 +77,7 @@ AllocatorReclaimer::AllocatorReclaimer(TimerService& timers, Allocator allocator
     : looks_(std::make_shared<Looks>(timers, std::move(allocator))) {}
 
 AllocatorReclaimer::~AllocatorReclaimer() {
-  const std::lock_guard lock(looks_->mutex);
+  const MutexLock lock(looks_->mutex);
   looks_->timer = nullptr;
 }
 

@@ -20,7 +20,7 @@ constexpr std::size_t kNotableBytes = std::size_t{64} * 1024;
 void ReplyOutbox::reply(std::uint32_t requestIdentifier, const std::optional<ReplyError>& error,
                         const std::optional<Value>& result) {
   {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     if (isClosed_ || state_ == State::kRefused) return;
     RpcWriter(unsent_).response(requestIdentifier, error, result);
     unsentBytes_ = unsent_.size() - sent_;
@@ -33,7 +33,7 @@ void ReplyOutbox::reply(std::uint32_t requestIdentifier, const std::optional<Rep
 void ReplyOutbox::endOfBatch() {
   bool mustWake = false;
   {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     isPutOff_ = false;
     if (isClosed_ || state_ != State::kOpen) return;
     const std::size_t before = unsent_.size();
@@ -44,13 +44,13 @@ void ReplyOutbox::endOfBatch() {
 }
 
 ReplyOutbox::State ReplyOutbox::flush() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   if (!isClosed_ && state_ == State::kFull) sendUnsent();
   return state_;
 }
 
 void ReplyOutbox::close() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   if (isClosed_) return;
   if (state_ != State::kRefused) sendUnsent();
   isClosed_ = true;

@@ -5,12 +5,12 @@
 #include <cstddef>
 #include <cstdint>
 #include <memory>
-#include <mutex>
 #include <string>
 
 #include "platform/RequestHandler.h"
 #include "platform/linux/threads/BatchScope.h"
 #include "platform/linux/threads/IoWaker.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -50,19 +50,18 @@ class ReplyOutbox final : public ReplySink,
   void close();
 
  private:
-  void sendUnsent();
+  void sendUnsent() REQUIRES(mutex_);
 
   const int socket_;
   const std::shared_ptr<IoWaker> waker_;
   const std::uint64_t connection_;
   std::atomic<std::size_t> unsentBytes_{0};
-  std::mutex mutex_;
-  // Under mutex_.
-  std::string unsent_;
-  std::size_t sent_ = 0;  // of unsent_
-  State state_ = State::kOpen;
-  bool isClosed_ = false;
-  bool isPutOff_ = false;  // the sending, to the end of a batch
+  Mutex mutex_;
+  std::string unsent_ GUARDED_BY(mutex_);
+  std::size_t sent_ GUARDED_BY(mutex_) = 0;  // of unsent_
+  State state_ GUARDED_BY(mutex_) = State::kOpen;
+  bool isClosed_ GUARDED_BY(mutex_) = false;
+  bool isPutOff_ GUARDED_BY(mutex_) = false;  // the sending, to the end of a batch
 };
 
 }  // namespace tonewerk

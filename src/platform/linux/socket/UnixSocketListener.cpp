@@ -42,14 +42,14 @@ UnixSocketListener::UnixSocketListener(std::unique_ptr<ServerSocket> socket, con
 UnixSocketListener::~UnixSocketListener() { shutDown(); }
 
 void UnixSocketListener::resume() {
-  const std::lock_guard lock(lifeMutex_);
+  const MutexLock lock(lifeMutex_);
   assert(delegate_ != nullptr);
   if (thread_.joinable() || isStopping_) return;
   thread_ = std::thread([this] { run(); });
 }
 
 void UnixSocketListener::shutDown() {
-  const std::lock_guard lock(lifeMutex_);
+  const MutexLock lock(lifeMutex_);
   isStopping_ = true;
   waker_->wake(kWaker);
   if (thread_.joinable()) thread_.join();

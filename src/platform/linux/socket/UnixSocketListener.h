@@ -6,7 +6,6 @@
 #include <cstddef>
 #include <cstdint>
 #include <memory>
-#include <mutex>
 #include <optional>
 #include <thread>
 #include <unistd.h>
@@ -20,6 +19,7 @@
 #include "platform/linux/socket/UnixConnection.h"
 #include "platform/linux/system/WatchdogFeeder.h"
 #include "platform/linux/threads/IoWaker.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -87,10 +87,10 @@ class UnixSocketListener final : public MessagingListener {
   std::optional<std::chrono::steady_clock::time_point> acceptAgainAt_;  // set while accepting is paused
   bool hasLoggedPause_ = false;
 
-  std::mutex lifeMutex_;  // of resume() and shutDown()
+  Mutex lifeMutex_;  // held by resume() and shutDown()
   std::atomic<bool> isStopping_ = false;
   std::atomic<bool> mustRestore_ = false;
-  std::thread thread_;
+  std::thread thread_ GUARDED_BY(lifeMutex_);
 };
 
 }  // namespace tonewerk

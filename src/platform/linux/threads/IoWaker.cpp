@@ -10,7 +10,7 @@ IoWaker::IoWaker() : event_(::eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK)) {}
 
 void IoWaker::wake(std::uint64_t connection) {
   {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     waiting_.push_back(connection);
     if (waiting_.size() > 1) return;  // whoever came first has signalled
   }
@@ -19,7 +19,7 @@ void IoWaker::wake(std::uint64_t connection) {
 }
 
 std::vector<std::uint64_t> IoWaker::take() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return std::exchange(waiting_, {});
 }
 

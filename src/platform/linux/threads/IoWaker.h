@@ -2,10 +2,10 @@
 #pragma once
 
 #include <cstdint>
-#include <mutex>
 #include <vector>
 
 #include "platform/linux/descriptors/FileDescriptor.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -26,8 +26,8 @@ class IoWaker {
 
  private:
   FileDescriptor event_;
-  std::mutex mutex_;
-  std::vector<std::uint64_t> waiting_;  // under mutex_
+  Mutex mutex_;
+  std::vector<std::uint64_t> waiting_ GUARDED_BY(mutex_);
 };
 
 }  // namespace tonewerk

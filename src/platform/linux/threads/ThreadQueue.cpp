@@ -26,21 +26,21 @@ ThreadQueue::ThreadQueue(std::string name, QueuePriority priority)
 ThreadQueue::~ThreadQueue() {
   assert(!isCurrent());
   {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     isEnding_ = true;
   }
-  workArrived_.notify_one();
+  workArrived_.notifyOne();
   thread_.join();
 }
 
 void ThreadQueue::async(Task work) {
   bool mustWake = false;
   {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     pending_.push_back(std::move(work));
     mustWake = std::exchange(isWaiting_, false);
   }
-  if (mustWake) workArrived_.notify_one();
+  if (mustWake) workArrived_.notifyOne();
 }
 
 void ThreadQueue::drain() {
@@ -71,7 +71,7 @@ void ThreadQueue::run() {
 }
 
 bool ThreadQueue::waitForWork(std::vector<Task>& batch) {
-  std::unique_lock lock(mutex_);
+  MutexLock lock(mutex_);
   while (pending_.empty()) {
     if (isEnding_) return false;
     isWaiting_ = true;

@@ -1,12 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <condition_variable>
-#include <mutex>
 #include <thread>
 #include <vector>
 
 #include "platform/SerialQueue.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -33,11 +32,11 @@ class ThreadQueue final : public SerialQueue {
 
   const std::string name_;
   const QueuePriority priority_;
-  std::mutex mutex_;  // guards the three below
-  std::vector<Task> pending_;
-  bool isWaiting_ = false;  // the thread sleeps, or is about to
-  bool isEnding_ = false;
-  std::condition_variable workArrived_;
+  Mutex mutex_;
+  std::vector<Task> pending_ GUARDED_BY(mutex_);
+  bool isWaiting_ GUARDED_BY(mutex_) = false;  // the thread sleeps, or is about to
+  bool isEnding_ GUARDED_BY(mutex_) = false;
+  Condition workArrived_;
   std::thread thread_;  // last: it uses all above
 };
 

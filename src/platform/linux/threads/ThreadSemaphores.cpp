@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/threads/ThreadSemaphores.h"
 
-#include <condition_variable>
 #include <cstddef>
-#include <mutex>
+
+#include "values/Mutex.h"
 
 namespace tonewerk {
 namespace {
@@ -12,22 +12,25 @@ namespace {
 class ThreadSemaphore final : public Semaphore {
  public:
   void signal() override {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     ++count_;
-    signalled_.notify_one();
+    signalled_.notifyOne();
   }
 
   bool wait(std::chrono::nanoseconds timeout) override {
-    std::unique_lock lock(mutex_);
-    if (!signalled_.wait_for(lock, timeout, [this] { return count_ > 0; })) return false;
+    const auto deadline = std::chrono::steady_clock::now() + timeout;
+    MutexLock lock(mutex_);
+    while (count_ == 0 && signalled_.waitUntil(lock, deadline)) {
+    }
+    if (count_ == 0) return false;
     --count_;
     return true;
   }
 
  private:
-  std::mutex mutex_;
-  std::condition_variable signalled_;
-  std::size_t count_ = 0;  // guarded by mutex_
+  Mutex mutex_;
+  Condition signalled_;
+  std::size_t count_ GUARDED_BY(mutex_) = 0;
 };
 
 }  // namespace

@@ -3,11 +3,10 @@
 
 #include <algorithm>
 #include <cassert>
-#include <condition_variable>
-#include <mutex>
 #include <vector>
 
 #include "platform/linux/threads/ThreadProperties.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 namespace {
@@ -16,43 +15,43 @@ using MonotonicTime = std::chrono::steady_clock::time_point;
 
 struct Entry {
   std::chrono::milliseconds interval;
-  MonotonicTime due;
+  MonotonicTime due;  // read and written with Schedule::mutex held
   std::function<void()> tick;
 };
 
 }  // namespace
 
 struct TimerThread::Schedule {
-  std::mutex mutex;  // guards all below
-  std::vector<std::shared_ptr<Entry>> entries;
-  bool isEnding = false;
-  std::condition_variable changed;
+  Mutex mutex;
+  std::vector<std::shared_ptr<Entry>> entries GUARDED_BY(mutex);
+  bool isEnding GUARDED_BY(mutex) = false;
+  Condition changed;
 
   void add(std::shared_ptr<Entry> entry) {
     {
-      const std::lock_guard lock(mutex);
+      const MutexLock lock(mutex);
       entries.push_back(std::move(entry));
     }
-    changed.notify_one();
+    changed.notifyOne();
   }
 
   // The thread is not woken: it finds out when it would have run the tick.
   void remove(const std::shared_ptr<Entry>& entry) {
-    const std::lock_guard lock(mutex);
+    const MutexLock lock(mutex);
     std::erase(entries, entry);
   }
 
   void end() {
     {
-      const std::lock_guard lock(mutex);
+      const MutexLock lock(mutex);
       isEnding = true;
     }
-    changed.notify_one();
+    changed.notifyOne();
   }
 
   // Waits for the next tick that is due, and sets when the one after it will be. Null when the service ends.
   std::shared_ptr<Entry> waitForDue() {
-    std::unique_lock lock(mutex);
+    MutexLock lock(mutex);
     for (;;) {
       if (isEnding) return nullptr;
       const auto next = std::min_element(entries.begin(), entries.end(),
@@ -66,7 +65,7 @@ struct TimerThread::Schedule {
       if (entry->due > now) {
         const MonotonicTime until = entry->due;
         entry.reset();  // the timer's owner may destroy the tick meanwhile
-        changed.wait_until(lock, until);
+        changed.waitUntil(lock, until);
         continue;
       }
       // Missed ticks are not made up for: the next one is the first that still lies ahead.

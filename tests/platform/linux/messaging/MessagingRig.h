@@ -3,17 +3,15 @@
 
 #include <atomic>
 #include <chrono>
-#include <condition_variable>
 #include <cstddef>
 #include <cstdint>
-#include <functional>
 #include <memory>
-#include <mutex>
 #include <string>
 #include <utility>
 #include <vector>
 
 #include "platform/Messaging.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -53,61 +51,67 @@ inline const RequestSet& rigInterface() {
 class MessagingRecord {
  public:
   void add(std::string event) {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     events_.push_back(std::move(event));
-    changed_.notify_all();
+    changed_.notifyAll();
   }
   void add(ReceivedRequest request) {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     requests_.push_back(std::move(request));
-    changed_.notify_all();
+    changed_.notifyAll();
   }
   void hold(Reply reply, InFlightToken token) {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     held_.emplace_back(std::move(reply), std::move(token));
-    changed_.notify_all();
+    changed_.notifyAll();
   }
 
   std::vector<std::string> events() const {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     return events_;
   }
   std::vector<ReceivedRequest> requests() const {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     return requests_;
   }
   std::size_t heldCount() const {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     return held_.size();
   }
   // Takes out what methods that hold have kept.
   std::vector<std::pair<Reply, InFlightToken>> takeHeld() {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     return std::exchange(held_, {});
   }
 
   bool waitForEvents(std::size_t count) const {
-    return waitUntil([this, count] { return events_.size() >= count; });
+    const auto deadline = std::chrono::steady_clock::now() + kPatience;
+    MutexLock lock(mutex_);
+    while (events_.size() < count && changed_.waitUntil(lock, deadline)) {
+    }
+    return events_.size() >= count;
   }
   bool waitForRequests(std::size_t count) const {
-    return waitUntil([this, count] { return requests_.size() >= count; });
+    const auto deadline = std::chrono::steady_clock::now() + kPatience;
+    MutexLock lock(mutex_);
+    while (requests_.size() < count && changed_.waitUntil(lock, deadline)) {
+    }
+    return requests_.size() >= count;
   }
   bool waitForHeld(std::size_t count) const {
-    return waitUntil([this, count] { return held_.size() >= count; });
+    const auto deadline = std::chrono::steady_clock::now() + kPatience;
+    MutexLock lock(mutex_);
+    while (held_.size() < count && changed_.waitUntil(lock, deadline)) {
+    }
+    return held_.size() >= count;
   }
 
  private:
-  bool waitUntil(const std::function<bool()>& condition) const {
-    std::unique_lock lock(mutex_);
-    return changed_.wait_for(lock, kPatience, condition);
-  }
-
-  mutable std::mutex mutex_;
-  mutable std::condition_variable changed_;
-  // Under mutex_.
-  std::vector<std::string> events_;
-  std::vector<ReceivedRequest> requests_;
-  std::vector<std::pair<Reply, InFlightToken>> held_;
+  mutable Mutex mutex_;
+  mutable Condition changed_;
+  std::vector<std::string> events_ GUARDED_BY(mutex_);
+  std::vector<ReceivedRequest> requests_ GUARDED_BY(mutex_);
+  std::vector<std::pair<Reply, InFlightToken>> held_ GUARDED_BY(mutex_);
 };
 
 class RigObject final : public RequestHandler {

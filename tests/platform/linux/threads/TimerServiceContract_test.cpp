@@ -1,14 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <chrono>
-#include <condition_variable>
 #include <gtest/gtest.h>
 #include <memory>
-#include <mutex>
 #include <thread>
 #include <vector>
 
 #include "platform/linux/threads/TimerThread.h"
 #include "support/manual/ManualTimers.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 namespace {
@@ -17,21 +16,15 @@ using std::chrono::milliseconds;
 
 // Time passes by itself.
 struct RealTime {
+  static constexpr bool kIsMovedByTheTest = false;
   TimerThread timers;
-  void letPass(std::unique_lock<std::mutex>& lock, std::condition_variable& changed) {
-    changed.wait_for(lock, std::chrono::seconds(10));
-  }
 };
 
 // Time passes when the test waits.
 struct ManualTime {
+  static constexpr bool kIsMovedByTheTest = true;
   ManualClock clock;
   ManualTimers timers{clock};
-  void letPass(std::unique_lock<std::mutex>& lock, std::condition_variable&) {
-    lock.unlock();
-    clock.advance(milliseconds(1));
-    lock.lock();
-  }
 };
 
 // What every timer service does.
@@ -44,21 +37,29 @@ class TimerServiceContract : public testing::Test {
   template <typename Change>
   void change(Change change) {
     {
-      const std::lock_guard lock(mutex_);
+      const MutexLock lock(mutex_);
       change();
     }
-    changed_.notify_all();
+    changed_.notifyAll();
   }
 
   // Waits until it is true.
-  template <typename Condition>
-  void waitUntil(Condition condition) {
-    std::unique_lock lock(mutex_);
-    while (!condition()) time_.letPass(lock, changed_);
+  template <typename Predicate>
+  void waitUntil(Predicate isTrue) {
+    MutexLock lock(mutex_);
+    while (!isTrue()) {
+      if constexpr (Time::kIsMovedByTheTest) {
+        lock.unlock();
+        time_.clock.advance(milliseconds(1));
+        lock.lock();
+      } else {
+        changed_.waitUntil(lock, std::chrono::steady_clock::now() + std::chrono::seconds(10));
+      }
+    }
   }
 
-  std::mutex mutex_;
-  std::condition_variable changed_;
+  Mutex mutex_;
+  Condition changed_;
   Time time_;  // last: its ticks use the above
 };
 
@@ -136,7 +137,7 @@ TYPED_TEST(TimerServiceContract, AllTicksRunOnOneThread) {
   const auto first = this->timers().repeat(milliseconds(1), tick);
   const auto second = this->timers().repeat(milliseconds(1), tick);
   this->waitUntil([&] { return threads.size() >= 6; });
-  const std::lock_guard lock(this->mutex_);
+  const MutexLock lock(this->mutex_);
   for (const std::thread::id thread : threads) EXPECT_EQ(thread, threads.front());
 }
 
