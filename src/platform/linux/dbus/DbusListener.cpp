@@ -31,6 +31,7 @@ void DbusListener::resume() {
 
 void DbusListener::shutDown() {
   const MutexLock lock(lifeMutex_);
+  assert(std::this_thread::get_id() != thread_.get_id());
   isStopping_ = true;
   waker_->wake(0);
   if (thread_.joinable()) thread_.join();

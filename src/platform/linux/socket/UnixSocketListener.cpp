@@ -50,6 +50,7 @@ void UnixSocketListener::resume() {
 
 void UnixSocketListener::shutDown() {
   const MutexLock lock(lifeMutex_);
+  assert(std::this_thread::get_id() != thread_.get_id());
   isStopping_ = true;
   waker_->wake(kWaker);
   if (thread_.joinable()) thread_.join();

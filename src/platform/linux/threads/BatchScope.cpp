@@ -17,6 +17,7 @@ BatchScope::BatchScope() {
 }
 
 BatchScope::~BatchScope() {
+  assert(currentBatch == this);
   end();
   currentBatch = nullptr;
 }
@@ -28,6 +29,7 @@ bool BatchScope::defer(std::shared_ptr<Deferred> ending) {
 }
 
 void BatchScope::pieceHasRun() {
+  assert(currentBatch == this);
   if (++pieces_ >= kMaxPieces) end();
 }
 

@@ -97,6 +97,7 @@ TimerThread::TimerThread()
     : schedule_(std::make_shared<Schedule>()), thread_([schedule = schedule_] { schedule->run(); }) {}
 
 TimerThread::~TimerThread() {
+  assert(std::this_thread::get_id() != thread_.get_id());
   schedule_->end();
   thread_.join();
 }
