@@ -47,7 +47,7 @@ class BoundedCommand {
   static BoundedCommand shell(std::string commandLine, const Limits& limits);
 
   // Any thread. Waits for the program.
-  Result run() const;
+  [[nodiscard]] Result run() const;
 
  private:
   const std::vector<std::string> arguments_;

@@ -15,7 +15,7 @@ class LinuxCommandRunner final : public CommandRunner {
  public:
   LinuxCommandRunner();
 
-  Result run(const std::string& command, const Limits& limits) override;
+  [[nodiscard]] Result run(const std::string& command, const Limits& limits) override;
 
  private:
   const std::string ownDirectory_;

@@ -21,7 +21,8 @@ DbusError dbusErrorOf(const ReplyError& error);
 // The answer to `call`, ready to be sent; null when the library cannot make it. `result` is none for kNone.
 // Integers are x, or t where they are unsigned; arrays av; maps a{sv}; dates (d); a text ends at a zero byte,
 // which D-Bus cannot carry.
-BusMessage makeDbusAnswer(sd_bus_message* call, ResultType type, const std::optional<ReplyError>& error,
-                          const std::optional<Value>& result);
+[[nodiscard]] BusMessage makeDbusAnswer(sd_bus_message* call, ResultType type,
+                                        const std::optional<ReplyError>& error,
+                                        const std::optional<Value>& result);
 
 }  // namespace tonewerk

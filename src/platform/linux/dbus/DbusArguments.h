@@ -28,7 +28,7 @@ struct DbusArguments {
 // Past them the problem is "over a limit".
 //
 // `texts` are those the bus's thread shares.
-DbusArguments readDbusArguments(sd_bus_message* call, const DbusInterface::Entry& entry, const Method& method,
-                                RpcStrings& texts);
+[[nodiscard]] DbusArguments readDbusArguments(sd_bus_message* call, const DbusInterface::Entry& entry,
+                                              const Method& method, RpcStrings& texts);
 
 }  // namespace tonewerk

@@ -65,12 +65,12 @@ class DbusConnection final : public MessagingConnection {
   void resume() override;
 
   // A call has come. What it is refused for, if it is.
-  std::optional<ReplyError> take(sd_bus_message* call, const DbusInterface::Entry& entry);
+  [[nodiscard]] std::optional<ReplyError> take(sd_bus_message* call, const DbusInterface::Entry& entry);
   // The bus has said who the client is. Once.
   void identify(DbusPeer peer);
   bool isIdentified() const { return isIdentified_; }
   // Sends one answer; false when there is none.
-  bool sendNext(sd_bus* bus);
+  [[nodiscard]] bool sendNext(sd_bus* bus);
   // Ends the connection; its handlers have returned when this does. Once; later calls do nothing.
   void end();
 
@@ -87,7 +87,7 @@ class DbusConnection final : public MessagingConnection {
     InFlightToken token;
   };
 
-  Reply replyTo(sd_bus_message* call, ResultType result);
+  [[nodiscard]] Reply replyTo(sd_bus_message* call, ResultType result);
   void handOver(Request request);
   void handOverWaiting();
 

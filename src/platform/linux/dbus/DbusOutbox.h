@@ -38,7 +38,7 @@ class DbusOutbox final : public BatchScope::Deferred, public std::enable_shared_
   void endOfBatch() override;
 
   // The bus's thread.
-  std::optional<DbusOutcome> next();
+  [[nodiscard]] std::optional<DbusOutcome> next();
   std::size_t unsentBytes() const { return unsentBytes_.load(std::memory_order_relaxed); }
   void close();
 

@@ -47,7 +47,7 @@ class DbusService {
   ~DbusService();
 
   // Until the bus is lost, or `isStopping` is set and the waker woken.
-  End serve(const std::atomic<bool>& isStopping);
+  [[nodiscard]] End serve(const std::atomic<bool>& isStopping);
   // Why serve() came back, for the log.
   const std::string& problem() const { return problem_; }
 
@@ -65,18 +65,18 @@ class DbusService {
   // What the library calls.
   struct Handlers;
 
-  bool start();
-  End lose(int result);
+  [[nodiscard]] bool start();
+  [[nodiscard]] End lose(int result);
   bool isFull() const;
   // Waits for the bus, the waker or the time. True when the bus is ready.
-  bool wait(bool onlyToSend) const;
+  [[nodiscard]] bool wait(bool onlyToSend) const;
   void takeWakes();
   void sendAnswers();
 
-  std::optional<ReplyError> request(sd_bus_message* call, const DbusInterface::Entry& entry);
+  [[nodiscard]] std::optional<ReplyError> request(sd_bus_message* call, const DbusInterface::Entry& entry);
   // Null when there are too many, or the bus does not answer.
-  Client* clientNamed(const std::string& name);
-  bool watch(Client& client);
+  [[nodiscard]] Client* clientNamed(const std::string& name);
+  [[nodiscard]] bool watch(Client& client);
   void remove(Client& client);
 
   const DbusNames& names_;

@@ -29,7 +29,7 @@ using BusSlot = std::unique_ptr<sd_bus_slot, BusSlotReleaser>;
 // Begins to connect to the bus at this D-Bus address, the system's bus when it is empty. Does not wait for
 // it: that nobody answers shows when the bus is processed. Null, and why in `problem`, when it cannot even
 // begin.
-Bus openBus(const std::string& address, std::string& problem);
+[[nodiscard]] Bus openBus(const std::string& address, std::string& problem);
 
 // How long the bus can be left alone, unless its descriptor becomes ready before: at most a minute.
 std::chrono::milliseconds timeToNextBusWork(sd_bus* bus);

@@ -28,7 +28,8 @@ class Epoll {
   bool change(int descriptor, std::uint64_t identifier, std::uint32_t events) {
     return control(EPOLL_CTL_MOD, descriptor, identifier, events);
   }
-  void remove(int descriptor) { control(EPOLL_CTL_DEL, descriptor, 0, 0); }
+  // Does nothing for a descriptor that is not in the list.
+  void remove(int descriptor) { static_cast<void>(control(EPOLL_CTL_DEL, descriptor, 0, 0)); }
 
   // Waits until something is ready or the time is up; without a time-out as long as it takes. The events are
   // valid until the next call; none when the time is up or a signal came.
@@ -46,7 +47,7 @@ class Epoll {
  private:
   static constexpr int kMaxAtOnce = 64;
 
-  bool control(int operation, int descriptor, std::uint64_t identifier, std::uint32_t events) {
+  [[nodiscard]] bool control(int operation, int descriptor, std::uint64_t identifier, std::uint32_t events) {
     epoll_event event{};
     event.events = events;
     event.data.u64 = identifier;

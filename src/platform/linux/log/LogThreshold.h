@@ -19,7 +19,7 @@ class LogThreshold {
 
   // Out of a text such as "info" or "twrr=debug,twrs=error,default"; what comes later in a list wins. None
   // for anything else, an empty text included; `problem` then says what is wrong with it.
-  static std::optional<LogThreshold> parse(std::string_view text, std::string& problem);
+  [[nodiscard]] static std::optional<LogThreshold> parse(std::string_view text, std::string& problem);
 
   // A comparison, or a few for categories that have a level of their own. Allocates nothing.
   bool isEnabled(std::string_view category, LogLevel level) const;

@@ -36,7 +36,7 @@ class RpcFrameReader {
 
   // Reads up to the end of one frame. Takes what it has used off the front of `bytes`, and it may take bytes
   // of later frames, too: call it until it needs more.
-  Result next(std::string_view& bytes);
+  [[nodiscard]] Result next(std::string_view& bytes);
 
   // After kFrame, until next(). May be moved from.
   RpcFrame& frame();

@@ -33,25 +33,25 @@ class RpcFrameVisitor {
   // Before a value by itself, which goes where it would in a frame.
   void initAt(ValuePlace place);
 
-  bool visit_nil();
-  bool visit_boolean(bool value) { return put(Value(value)); }
-  bool visit_positive_integer(std::uint64_t value);
-  bool visit_negative_integer(std::int64_t value);
-  bool visit_float32(float value) { return put(Value(static_cast<double>(value))); }
-  bool visit_float64(double value) { return put(Value(value)); }
-  bool visit_str(const char* data, std::uint32_t size);
-  bool visit_bin(const char* data, std::uint32_t size);
-  bool visit_ext(const char* data, std::uint32_t size);
-  bool start_array(std::uint32_t count);
+  [[nodiscard]] bool visit_nil();
+  [[nodiscard]] bool visit_boolean(bool value) { return put(Value(value)); }
+  [[nodiscard]] bool visit_positive_integer(std::uint64_t value);
+  [[nodiscard]] bool visit_negative_integer(std::int64_t value);
+  [[nodiscard]] bool visit_float32(float value) { return put(Value(static_cast<double>(value))); }
+  [[nodiscard]] bool visit_float64(double value) { return put(Value(value)); }
+  [[nodiscard]] bool visit_str(const char* data, std::uint32_t size);
+  [[nodiscard]] bool visit_bin(const char* data, std::uint32_t size);
+  [[nodiscard]] bool visit_ext(const char* data, std::uint32_t size);
+  [[nodiscard]] bool start_array(std::uint32_t count);
   bool start_array_item() { return true; }
   bool end_array_item() { return true; }
-  bool end_array();
-  bool start_map(std::uint32_t count);
+  [[nodiscard]] bool end_array();
+  [[nodiscard]] bool start_map(std::uint32_t count);
   bool start_map_key();
   bool end_map_key() { return true; }
   bool start_map_value();
   bool end_map_value() { return true; }
-  bool end_map();
+  [[nodiscard]] bool end_map();
   void parse_error(std::size_t, std::size_t) { broken("bytes that are not MessagePack"); }
   void insufficient_bytes(std::size_t, std::size_t) {}
   bool referenced() const { return false; }
@@ -72,17 +72,17 @@ class RpcFrameVisitor {
   bool isInArguments() const { return depth_ == 2 && isReadingArguments_; }
   bool isKeyAwaited() const { return depth_ > 1 && !isInArguments() && containers_[depth_ - 1].awaitsKey; }
 
-  bool open(bool isMap, std::uint32_t count);
-  bool startFrame(std::uint32_t count);
+  [[nodiscard]] bool open(bool isMap, std::uint32_t count);
+  [[nodiscard]] bool startFrame(std::uint32_t count);
   bool startArguments(std::uint32_t count);
-  bool put(Value value);
-  bool putInFrame(Value value);
-  bool setKind(const Value& value);
-  bool setIdentifier(const Value& value);
-  bool setMethod(std::string_view text);
+  [[nodiscard]] bool put(Value value);
+  [[nodiscard]] bool putInFrame(Value value);
+  [[nodiscard]] bool setKind(const Value& value);
+  [[nodiscard]] bool setIdentifier(const Value& value);
+  [[nodiscard]] bool setMethod(std::string_view text);
   static void putInMap(Container& container, Value value);
-  bool putKey(std::string_view text);
-  std::optional<SharedString> sharedText(StringInterner& cache, std::string_view text) const;
+  [[nodiscard]] bool putKey(std::string_view text);
+  [[nodiscard]] std::optional<SharedString> sharedText(StringInterner& cache, std::string_view text) const;
   // Notes the first value that the protocol does not carry and goes on with a stand-in for it.
   bool refuse(const char* what);
 

@@ -13,7 +13,7 @@ namespace tonewerk {
 inline constexpr int kTimestampExtension = -1;
 
 // None for another length and for more than 999,999,999 nanoseconds.
-std::optional<Date> dateOfTimestamp(std::string_view body);
+[[nodiscard]] std::optional<Date> dateOfTimestamp(std::string_view body);
 
 // The shortest form that holds `date`, to the nearest nanosecond. What seconds in 64 bits cannot say becomes
 // the nearest that they can, NaN 1970.

@@ -13,6 +13,6 @@ namespace tonewerk {
 enum class ValuePlace { kArgument, kResult };
 
 // The one value that `bytes` are. None for nil, and for everything that no frame could carry in that place.
-std::optional<Value> readValue(std::string_view bytes, ValuePlace place);
+[[nodiscard]] std::optional<Value> readValue(std::string_view bytes, ValuePlace place);
 
 }  // namespace tonewerk

@@ -37,6 +37,6 @@ class RpcWriter {
 };
 
 // Whether a frame with these arguments is nested no deeper than a frame may be.
-bool fitsFrameDepth(const Arguments& arguments);
+[[nodiscard]] bool fitsFrameDepth(const Arguments& arguments);
 
 }  // namespace tonewerk

@@ -21,7 +21,7 @@ class StringInterner {
   StringInterner(std::size_t slots, std::size_t mostBytes) : slots_(slots), mostBytes_(mostBytes) {}
 
   // The text, shared with its earlier users where possible. None when isText() says that it is none.
-  std::optional<SharedString> find(std::string_view text);
+  [[nodiscard]] std::optional<SharedString> find(std::string_view text);
 
  private:
   struct Slot {

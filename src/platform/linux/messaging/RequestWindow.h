@@ -25,12 +25,12 @@ class RequestWindow final : public InFlightCounter, public std::enable_shared_fr
   void finished(std::size_t bytes) override;
 
   // The I/O thread: a request begins, and has ended when the token is gone.
-  InFlightToken start(std::size_t bytes);
+  [[nodiscard]] InFlightToken start(std::size_t bytes);
 
   // The I/O thread: whether there is room for another request beside `otherBytes` that the connection holds.
   // When there is none, the connection is woken once half of the requests under way have finished: not for
   // each, so that an overloaded daemon does not also switch threads for every request.
-  bool hasRoom(std::size_t otherBytes);
+  [[nodiscard]] bool hasRoom(std::size_t otherBytes);
 
  private:
   static constexpr std::uint64_t kNever = std::numeric_limits<std::uint64_t>::max();

@@ -43,7 +43,7 @@ class ReplyOutbox final : public ReplySink,
   void endOfBatch() override;
 
   // The I/O thread: goes on with what the socket did not take.
-  State flush();
+  [[nodiscard]] State flush();
   // Any thread.
   std::size_t unsentBytes() const { return unsentBytes_.load(std::memory_order_relaxed); }
   // The I/O thread: the socket is about to be closed. Sends what it still takes.

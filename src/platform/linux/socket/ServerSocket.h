@@ -16,7 +16,7 @@ class ServerSocket {
   // (mode 0660, its directory made when missing), where the file that a dead daemon left is replaced. None
   // when that fails or another process listens there; `problem` then says why, and who. Waits for a process
   // that has locked the directory, as daemons that start do for a moment.
-  static std::unique_ptr<ServerSocket> open(const std::string& path, std::string& problem);
+  [[nodiscard]] static std::unique_ptr<ServerSocket> open(const std::string& path, std::string& problem);
 
   ServerSocket(const ServerSocket&) = delete;
   ServerSocket& operator=(const ServerSocket&) = delete;
@@ -29,7 +29,7 @@ class ServerSocket {
   // A new one in the place of one that went. Its directory must be there again. None, with `problem` saying
   // why, also for a socket that systemd passed, which only systemd can make again, and while another process
   // has locked the directory: nothing is waited for.
-  std::unique_ptr<ServerSocket> madeAgain(std::string& problem) const;
+  [[nodiscard]] std::unique_ptr<ServerSocket> madeAgain(std::string& problem) const;
 
   // Non-blocking.
   int fileDescriptor() const { return descriptor_.get(); }
@@ -39,9 +39,9 @@ class ServerSocket {
  private:
   explicit ServerSocket(FileDescriptor descriptor) : descriptor_(std::move(descriptor)) {}
 
-  static std::unique_ptr<ServerSocket> fromSystemd();
-  static std::unique_ptr<ServerSocket> bound(const std::string& path, int lockOperation,
-                                             std::string& problem);
+  [[nodiscard]] static std::unique_ptr<ServerSocket> fromSystemd();
+  [[nodiscard]] static std::unique_ptr<ServerSocket> bound(const std::string& path, int lockOperation,
+                                                           std::string& problem);
   // Notes what the socket's file is now.
   void noteFile(const std::string& path);
 

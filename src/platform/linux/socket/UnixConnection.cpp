@@ -163,10 +163,15 @@ void UnixConnection::updateInterest() {
   // Without anything wanted the socket is taken out: a hang-up is reported whether it is wanted or not.
   if (wanted == 0) {
     context_.epoll.remove(socket_.get());
-  } else if (interest_ == 0) {
-    context_.epoll.add(socket_.get(), identifier_, wanted);
   } else {
-    context_.epoll.change(socket_.get(), identifier_, wanted);
+    const bool isWatched = interest_ == 0 ? context_.epoll.add(socket_.get(), identifier_, wanted)
+                                          : context_.epoll.change(socket_.get(), identifier_, wanted);
+    // add() fails when the kernel has no memory or the user watches too many descriptors. The next event or
+    // wake tries again.
+    if (!isWatched) {
+      errorLog(context_.log, "cannot wait for %@: %@", *this, std::generic_category().message(errno));
+      return;
+    }
   }
   interest_ = wanted;
 }

@@ -68,7 +68,8 @@ class UnixConnection final : public MessagingConnection {
   // Takes frames off `bytes` until they or the room are used up.
   void process(std::string_view bytes);
   void dispatch(RpcFrame& frame);
-  std::optional<ReplyError> problemWithFrame(const RpcFrame& frame, std::optional<std::size_t> method) const;
+  [[nodiscard]] std::optional<ReplyError> problemWithFrame(const RpcFrame& frame,
+                                                           std::optional<std::size_t> method) const;
   void endAsBroken(std::string_view problem);
   void updateInterest();
   bool hasRoom() { return load_->hasRoom(outbox_->unsentBytes()); }

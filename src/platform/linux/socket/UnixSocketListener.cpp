@@ -59,8 +59,11 @@ void UnixSocketListener::shutDown() {
 
 void UnixSocketListener::run() {
   ::pthread_setname_np(::pthread_self(), "tw-messaging");
-  epoll_.add(socket_->fileDescriptor(), kSocket, EPOLLIN);
-  epoll_.add(waker_->fileDescriptor(), kWaker, EPOLLIN | EPOLLET);
+  // Without its waker the thread would never learn that it is to stop.
+  if (!epoll_.add(waker_->fileDescriptor(), kWaker, EPOLLIN | EPOLLET)) {
+    errorLog(log_, "cannot be woken: %@", std::generic_category().message(errno));
+  }
+  watchSocket();
   infoLog(log_, "listening at %@", socket_->name());
   while (!isStopping_) {
     const BatchScope round;
@@ -108,7 +111,7 @@ void UnixSocketListener::makeSocketAgain() {
   const bool isPaused = acceptAgainAt_.has_value();
   if (!isPaused) epoll_.remove(socket_->fileDescriptor());
   socket_ = std::move(socket);
-  if (!isPaused) epoll_.add(socket_->fileDescriptor(), kSocket, EPOLLIN);
+  if (!isPaused) watchSocket();
   defaultLog(log_, "%@ was gone and is made again", socket_->name());
 }
 
@@ -151,7 +154,12 @@ void UnixSocketListener::pauseAccepting(const std::string& why) {
 
 void UnixSocketListener::resumeAccepting() {
   acceptAgainAt_.reset();
-  epoll_.add(socket_->fileDescriptor(), kSocket, EPOLLIN);
+  watchSocket();
+}
+
+void UnixSocketListener::watchSocket() {
+  if (epoll_.add(socket_->fileDescriptor(), kSocket, EPOLLIN)) return;
+  pauseAccepting(std::generic_category().message(errno));
 }
 
 std::optional<std::chrono::milliseconds> UnixSocketListener::timeToNextAccept() const {

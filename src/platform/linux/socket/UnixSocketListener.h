@@ -65,6 +65,8 @@ class UnixSocketListener final : public MessagingListener {
   void add(FileDescriptor socket);
   void pauseAccepting(const std::string& why);
   void resumeAccepting();
+  // Puts the listening socket into the epoll. Pauses accepting, and so tries again later, when that fails.
+  void watchSocket();
   std::optional<std::chrono::milliseconds> timeToNextAccept() const;
   std::optional<std::chrono::milliseconds> timeToNextRound() const;
   void removeIfEnded(std::uint64_t identifier);

@@ -29,7 +29,7 @@ class BatchScope {
   ~BatchScope();
 
   // Puts `ending` off to the end of the calling thread's batch. False when it runs none.
-  static bool defer(std::shared_ptr<Deferred> ending);
+  [[nodiscard]] static bool defer(std::shared_ptr<Deferred> ending);
 
   // A piece of work has run. Ends the batch, and begins the next, after kMaxPieces.
   void pieceHasRun();

@@ -22,7 +22,7 @@ class IoWaker {
   // is an edge of its own.
   int fileDescriptor() const { return event_.get(); }
   // The I/O thread: who asked since the last call.
-  std::vector<std::uint64_t> take();
+  [[nodiscard]] std::vector<std::uint64_t> take();
 
  private:
   FileDescriptor event_;

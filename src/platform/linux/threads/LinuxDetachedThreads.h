@@ -8,7 +8,7 @@ namespace tonewerk {
 // Threads behind everything a user waits for, as is what they start.
 class LinuxDetachedThreads final : public DetachedThreads {
  public:
-  std::error_code start(std::string_view name, Task work) override;
+  [[nodiscard]] std::error_code start(std::string_view name, Task work) override;
 };
 
 }  // namespace tonewerk

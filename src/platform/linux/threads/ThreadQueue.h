@@ -28,7 +28,7 @@ class ThreadQueue final : public SerialQueue {
  private:
   void run();
   // False when the queue ends and nothing is left.
-  bool waitForWork(std::vector<Task>& batch);
+  [[nodiscard]] bool waitForWork(std::vector<Task>& batch);
 
   const std::string name_;
   const QueuePriority priority_;

@@ -8,7 +8,8 @@ namespace tonewerk {
 // Makes queues that have a thread each. Any thread.
 class ThreadQueueFactory final : public SerialQueueFactory {
  public:
-  std::unique_ptr<SerialQueue> makeSerialQueue(std::string name, QueuePriority priority) override;
+  [[nodiscard]] std::unique_ptr<SerialQueue> makeSerialQueue(std::string name,
+                                                             QueuePriority priority) override;
 };
 
 }  // namespace tonewerk

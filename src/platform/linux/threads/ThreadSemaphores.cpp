@@ -17,7 +17,7 @@ class ThreadSemaphore final : public Semaphore {
     signalled_.notifyOne();
   }
 
-  bool wait(std::chrono::nanoseconds timeout) override {
+  [[nodiscard]] bool wait(std::chrono::nanoseconds timeout) override {
     const auto deadline = std::chrono::steady_clock::now() + timeout;
     MutexLock lock(mutex_);
     while (count_ == 0 && signalled_.waitUntil(lock, deadline)) {

@@ -8,7 +8,7 @@ namespace tonewerk {
 // Semaphores for threads that sleep. Waits follow the monotonic clock.
 class ThreadSemaphores final : public SemaphoreFactory {
  public:
-  std::unique_ptr<Semaphore> makeSemaphore() override;
+  [[nodiscard]] std::unique_ptr<Semaphore> makeSemaphore() override;
 };
 
 }  // namespace tonewerk

@@ -22,7 +22,8 @@ class TimerThread final : public TimerService {
   ~TimerThread() override;
 
   // `interval` is at least one millisecond.
-  std::unique_ptr<Timer> repeat(std::chrono::milliseconds interval, std::function<void()> tick) override;
+  [[nodiscard]] std::unique_ptr<Timer> repeat(std::chrono::milliseconds interval,
+                                              std::function<void()> tick) override;
 
  private:
   struct Schedule;

@@ -112,7 +112,7 @@ class DbusCaller {
 
   const std::vector<DbusReceived>& received() const { return received_; }
   // Whatever is there already counts.
-  bool waitForReceived(std::size_t count) {
+  [[nodiscard]] bool waitForReceived(std::size_t count) {
     const auto end = std::chrono::steady_clock::now() + kTimeout;
     while (received_.size() < count && std::chrono::steady_clock::now() < end) {
       const int result = sd_bus_process(bus_.get(), nullptr);

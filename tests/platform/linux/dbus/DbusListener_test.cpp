@@ -46,14 +46,14 @@ class DbusListenerTest : public testing::Test {
   }
 
   // Until somebody has the name, or nobody.
-  bool waitForName(bool isOwned = true) const {
+  [[nodiscard]] bool waitForName(bool isOwned = true) const {
     DbusCaller asker(bus.address(),
                      {"org.freedesktop.DBus", "/org/freedesktop/DBus", "org.freedesktop.DBus"});
     return waitFor(asker,
                    [&] { return asker.ask("NameHasOwner", "s", kNames.name.c_str()).boolean() == isOwned; });
   }
   // Asks `condition` again and again, a little later each time.
-  static bool waitFor(DbusCaller& caller, const std::function<bool()>& condition) {
+  [[nodiscard]] static bool waitFor(DbusCaller& caller, const std::function<bool()>& condition) {
     const auto end = std::chrono::steady_clock::now() + kPatience;
     while (!condition()) {
       if (std::chrono::steady_clock::now() >= end) return false;
@@ -62,7 +62,7 @@ class DbusListenerTest : public testing::Test {
     return true;
   }
 
-  static bool isServed(DbusCaller& caller) {
+  [[nodiscard]] static bool isServed(DbusCaller& caller) {
     const DbusReceived answer = caller.ask("TakeInt64", "x", std::int64_t{1});
     return answer.error.empty() && answer.message != nullptr;
   }
@@ -72,7 +72,7 @@ class DbusListenerTest : public testing::Test {
     appendMap(call.get(), {{"text", std::string(size, 'x')}});
     return caller.ask(call);
   }
-  bool waitForLines(std::size_t count) const {
+  [[nodiscard]] bool waitForLines(std::size_t count) const {
     const auto end = std::chrono::steady_clock::now() + kPatience;
     while (log.linesOf("twrs").size() < count) {
       if (std::chrono::steady_clock::now() >= end) return false;

@@ -54,7 +54,7 @@ TEST(LogThresholdTest, NonsenseIsRefusedAndNamed) {
     EXPECT_NE(problem, "") << text;
   }
   std::string problem;
-  LogThreshold::parse("info,twrr=loud", problem);
+  EXPECT_FALSE(LogThreshold::parse("info,twrr=loud", problem));
   EXPECT_NE(problem.find("\"twrr=loud\""), std::string::npos) << problem;
 }
 

@@ -84,21 +84,21 @@ class MessagingRecord {
     return std::exchange(held_, {});
   }
 
-  bool waitForEvents(std::size_t count) const {
+  [[nodiscard]] bool waitForEvents(std::size_t count) const {
     const auto deadline = std::chrono::steady_clock::now() + kPatience;
     MutexLock lock(mutex_);
     while (events_.size() < count && changed_.waitUntil(lock, deadline)) {
     }
     return events_.size() >= count;
   }
-  bool waitForRequests(std::size_t count) const {
+  [[nodiscard]] bool waitForRequests(std::size_t count) const {
     const auto deadline = std::chrono::steady_clock::now() + kPatience;
     MutexLock lock(mutex_);
     while (requests_.size() < count && changed_.waitUntil(lock, deadline)) {
     }
     return requests_.size() >= count;
   }
-  bool waitForHeld(std::size_t count) const {
+  [[nodiscard]] bool waitForHeld(std::size_t count) const {
     const auto deadline = std::chrono::steady_clock::now() + kPatience;
     MutexLock lock(mutex_);
     while (held_.size() < count && changed_.waitUntil(lock, deadline)) {

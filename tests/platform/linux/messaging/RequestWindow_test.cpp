@@ -90,7 +90,7 @@ TEST_F(RequestWindowTest, NeverMissesTheLastFinishOnAnotherThread) {
     finisher.join();
     ASSERT_TRUE(hadRoom || !waker->take().empty());
     ASSERT_TRUE(load->hasRoom(0));
-    waker->take();
+    static_cast<void>(waker->take());  // of this round; the next one begins without
   }
 }
 

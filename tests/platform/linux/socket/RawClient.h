@@ -48,7 +48,7 @@ class RawClient {
   }
 
   // The next response; none at the connection's end, or when none comes in time.
-  std::optional<RpcFrame> response() {
+  [[nodiscard]] std::optional<RpcFrame> response() {
     for (;;) {
       std::string_view bytes = unread_;
       const RpcFrameReader::Result result = reader_.next(bytes);
@@ -59,14 +59,14 @@ class RawClient {
   }
 
   // True when the other side ends the connection; what comes before that is skipped.
-  bool waitForEnd() {
+  [[nodiscard]] bool waitForEnd() {
     while (receive()) {
     }
     return hasEnded_;
   }
 
  private:
-  bool receive() {
+  [[nodiscard]] bool receive() {
     pollfd polled{socket_.get(), POLLIN, 0};
     if (::poll(&polled, 1, 30'000) <= 0) return false;
     std::array<char, 4096> bytes;

@@ -316,7 +316,8 @@ TEST_F(UnixSocketListenerTest, EndsAConnectionThatSendsAResponse) {
 TEST_F(UnixSocketListenerTest, EndsAConnectionWhoseFrameIsTooLong) {
   RawClient client(path);
   // The other side stops reading before all of it is sent, so the send may fail.
-  client.send(requestOf(1, "takeMap", {Value(ValueMap{{"text", std::string(kMaxFrameBytes, 'x')}})}));
+  static_cast<void>(
+      client.send(requestOf(1, "takeMap", {Value(ValueMap{{"text", std::string(kMaxFrameBytes, 'x')}})})));
   EXPECT_TRUE(client.waitForEnd());
   EXPECT_THAT(errorLines(), ElementsAre(HasSubstr("a frame that is too long")));
   EXPECT_THAT(record.requests(), IsEmpty());
@@ -415,7 +416,7 @@ TEST_F(UnixSocketListenerTest, ReadsNoFurtherThanTheBoundOfUnfinishedBytes) {
   RawClient client(path);
   const std::string frame = notificationOf("holdMap", {Value(ValueMap{{"text", std::string(900'000, 'x')}})});
   std::thread sender([&] {
-    for (int at = 0; at < 10; ++at) client.send(frame);
+    for (int at = 0; at < 10; ++at) EXPECT_TRUE(client.send(frame));
   });
   // 4 of 900,000 bytes leave room for one more.
   ASSERT_TRUE(record.waitForHeld(5));

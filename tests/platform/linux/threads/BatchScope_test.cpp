@@ -37,7 +37,7 @@ TEST(BatchScopeTest, NothingIsPutOffOutsideOfABatch) {
 TEST(BatchScopeTest, EndsAfterSoManyPieces) {
   const auto counter = std::make_shared<Counter>();
   BatchScope batch;
-  BatchScope::defer(counter);
+  EXPECT_TRUE(BatchScope::defer(counter));
   for (std::size_t piece = 1; piece < BatchScope::kMaxPieces; ++piece) batch.pieceHasRun();
   EXPECT_EQ(counter->ends, 0);
   batch.pieceHasRun();
@@ -48,7 +48,7 @@ TEST(BatchScopeTest, AnEndingMayPutOffAnother) {
   class Chain final : public BatchScope::Deferred {
    public:
     explicit Chain(std::shared_ptr<Counter> next) : next_(std::move(next)) {}
-    void endOfBatch() override { BatchScope::defer(next_); }
+    void endOfBatch() override { EXPECT_TRUE(BatchScope::defer(next_)); }
 
    private:
     std::shared_ptr<Counter> next_;
@@ -56,7 +56,7 @@ TEST(BatchScopeTest, AnEndingMayPutOffAnother) {
   const auto counter = std::make_shared<Counter>();
   {
     const BatchScope batch;
-    BatchScope::defer(std::make_shared<Chain>(counter));
+    EXPECT_TRUE(BatchScope::defer(std::make_shared<Chain>(counter)));
   }
   EXPECT_EQ(counter->ends, 1);
 }
