@@ -33,11 +33,11 @@ bool openPipe(Pipe& pipe) {
   if (pipe2(ends.data(), O_CLOEXEC) != 0) return false;
   pipe.reading.reset(ends[0]);
   pipe.writing.reset(ends[1]);
-  // Ours alone: the program's end shall wait when the pipe is full.
+  // Only this end: the program is to block when the pipe is full.
   return fcntl(pipe.reading.get(), F_SETFL, O_NONBLOCK) == 0;
 }
 
-// How the program is started: in a process group of its own, with nothing of ours but its output.
+// Starts the program in its own process group, with no descriptor of this process except its output.
 class SpawnSettings {
  public:
   explicit SpawnSettings(int output) {
@@ -76,10 +76,11 @@ class SpawnSettings {
   posix_spawnattr_t attributes_;
 };
 
-// Readable when the process has ended. The C library's header for it is none for C++ on Debian 12.
+// The descriptor is readable when the process has ended. On Debian 12 the C library's header for it does not
+// compile as C++.
 int openProcess(pid_t process) { return static_cast<int>(syscall(SYS_pidfd_open, process, 0)); }
 
-// A program that was started. Its end takes its process group along and leaves no zombie.
+// Owns a program that was started. Ends it together with its process group and leaves no zombie.
 class RunningProgram {
  public:
   RunningProgram(pid_t process, FileDescriptor output)
@@ -91,8 +92,8 @@ class RunningProgram {
   RunningProgram& operator=(const RunningProgram&) = delete;
   ~RunningProgram() { static_cast<void>(end()); }
 
-  // None when it has ended by itself.
-  std::optional<End> takeOutput(std::string& output, std::size_t most, Clock::time_point deadline) {
+  // Appends its output to `output`. None when it has ended by itself.
+  std::optional<End> takeOutput(std::string& output, std::size_t maxBytes, Clock::time_point deadline) {
     if (!watch_) {
       errno = watchError_;
       return End::kNotStarted;
@@ -100,17 +101,17 @@ class RunningProgram {
     for (;;) {
       std::array<pollfd, 2> waited{pollfd{watch_.get(), POLLIN, 0}, pollfd{output_.get(), POLLIN, 0}};
       if (!wait(waited, deadline)) return End::kTimedOut;
-      // What it wrote before its end is in the pipe when its end is seen.
+      // When the end is seen, all that it wrote before is in the pipe.
       const bool hasEnded = waited[0].revents != 0;
-      if (!readAvailable(output, most, deadline)) return End::kTooMuchOutput;
+      if (!readAvailable(output, maxBytes, deadline)) return End::kTooMuchOutput;
       if (hasEnded) return std::nullopt;
     }
   }
 
-  // The status as waitpid() gives it.
+  // Kills the process group and waits for the program. Its status, as waitpid() gives it.
   int end() {
     if (process_ < 0) return status_;
-    // Before it is waited for: until then its number, and so its group's, is nobody else's.
+    // Before waitpid(): until then no other process or group can get its number.
     kill(-process_, SIGKILL);
     while (waitpid(process_, &status_, 0) < 0 && errno == EINTR) {
     }
@@ -123,25 +124,26 @@ class RunningProgram {
     for (;;) {
       const auto left = std::chrono::ceil<std::chrono::milliseconds>(deadline - Clock::now());
       if (left.count() <= 0) return false;
-      constexpr long kMax = 60'000;
-      const int count = poll(waited.data(), waited.size(), static_cast<int>(std::min(left.count(), kMax)));
+      constexpr long kMaxPollMs = 60'000;
+      const int count =
+          poll(waited.data(), waited.size(), static_cast<int>(std::min(left.count(), kMaxPollMs)));
       if (count > 0) return true;
     }
   }
 
-  // False when there is more than `most` bytes.
-  bool readAvailable(std::string& output, std::size_t most, Clock::time_point deadline) {
+  // False when there are more than `maxBytes` bytes.
+  bool readAvailable(std::string& output, std::size_t maxBytes, Clock::time_point deadline) {
     std::array<char, 16'384> buffer;
-    // A program that never stops writing does not get more than its time.
+    // The time also ends a program that never stops writing.
     while (output_ && Clock::now() < deadline) {
       const ssize_t count = read(output_.get(), buffer.data(), buffer.size());
       if (count < 0 && errno == EINTR) continue;
       if (count < 0 && errno == EAGAIN) return true;
       if (count <= 0) {
-        output_.reset();  // nobody has it open any more
+        output_.reset();  // no process has it open any more
         return true;
       }
-      const std::size_t taken = std::min(static_cast<std::size_t>(count), most - output.size());
+      const std::size_t taken = std::min(static_cast<std::size_t>(count), maxBytes - output.size());
       output.append(buffer.data(), taken);
       if (taken < static_cast<std::size_t>(count)) return false;
     }

@@ -8,16 +8,16 @@
 
 namespace tonewerk {
 
-// Runs a program and takes what it writes to its standard output, within bounds of time and bytes.
+// Runs a program and collects its standard output, within a time limit and a size limit.
 //
 //   const BoundedCommand::Result result = BoundedCommand::shell("slabtop --once", {}).run();
 //
-// Whatever the program does, run() returns at most a moment after its time is over, and then
+// Whatever the program does, run() returns shortly after the time limit at the latest. By then
 // - the program has ended and is no zombie,
-// - so has everything that it started, except what left its process group,
-// - nobody waits for the pipe, even if somebody still has it open.
+// - everything that it started has ended, except processes that left its process group,
+// - the pipe is closed, even if another process still has it open.
 // The program gets an empty standard input, this process's environment and working directory, the default
-// signal mask and actions, and no other file descriptor. What it writes to its standard error is lost.
+// signal mask and actions, and no other file descriptor. Its standard error is discarded.
 class BoundedCommand {
  public:
   struct Limits {
@@ -26,27 +26,27 @@ class BoundedCommand {
   };
 
   enum class End {
-    kExited,         // of its own accord, with Result::status
-    kSignalled,      // by the signal Result::status, which was not ours
-    kTimedOut,       // ended by us
-    kTooMuchOutput,  // ended by us at the first byte beyond the bound
-    kNotStarted,     // there is no such program, or it may not be run
+    kExited,         // by itself, with Result::status
+    kSignalled,      // by the signal Result::status, which another process sent or the program caused
+    kTimedOut,       // killed at the time limit
+    kTooMuchOutput,  // killed at the first byte beyond the limit
+    kNotStarted,     // there is no such program, or it may not be executed
   };
 
   struct Result {
     End end = End::kNotStarted;
     int status = 0;
-    std::string output;   // all of it, or as much as came before the end
-    std::string problem;  // in words; empty when it exited with status 0
+    std::string output;   // all of it, or what came before the end
+    std::string problem;  // for people; empty when it exited with status 0
   };
 
-  // The first argument is the program, looked for in PATH when it has no slash.
+  // The first argument is the program. It is searched for in PATH when it has no slash.
   BoundedCommand(std::vector<std::string> arguments, const Limits& limits);
 
-  // A command line for /bin/sh. One that the shell cannot start exits with status 126 or 127.
+  // Runs a command line with /bin/sh. If the shell cannot start a command it exits with status 126 or 127.
   static BoundedCommand shell(std::string commandLine, const Limits& limits);
 
-  // Any thread. Waits for the program.
+  // Any thread. Blocks until the program has ended.
   [[nodiscard]] Result run() const;
 
  private:

@@ -13,7 +13,7 @@ namespace {
 constexpr int kStatusNotExecutable = 126;
 constexpr int kStatusNotFound = 127;
 
-// Arguments instead of a longer command line: nothing has to be quoted.
+// Passes the directory and the command as arguments, so that they need no quoting.
 constexpr const char* kRunFirstArgument = R"(PATH="$0${PATH:+:$PATH}"; export PATH; eval "$1")";
 
 std::string directoryOfThisExecutable() {
@@ -24,9 +24,9 @@ std::string directoryOfThisExecutable() {
 CommandRunner::End endOf(const BoundedCommand::Result& result) {
   switch (result.end) {
     case BoundedCommand::End::kExited: {
-      const bool isShellsWord = result.status == kStatusNotExecutable || result.status == kStatusNotFound;
-      return isShellsWord && result.output.empty() ? CommandRunner::End::kNotStarted
-                                                   : CommandRunner::End::kExited;
+      const bool isShellsStatus = result.status == kStatusNotExecutable || result.status == kStatusNotFound;
+      return isShellsStatus && result.output.empty() ? CommandRunner::End::kNotStarted
+                                                     : CommandRunner::End::kExited;
     }
     case BoundedCommand::End::kSignalled:
       return CommandRunner::End::kSignalled;

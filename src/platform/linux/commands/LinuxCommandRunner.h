@@ -7,10 +7,10 @@
 
 namespace tonewerk {
 
-// Commands of /bin/sh; what happens to one that does not end is said at BoundedCommand. In PATH, the
-// directory of this process's executable comes first, so that the tools that lie beside it are found.
+// Runs commands with /bin/sh. BoundedCommand describes what happens to a command that does not end. The
+// directory of this process's executable is first in PATH, so that the tools beside it are found.
 //
-// A status of 126 or 127 without any output is the shell's word for a command that could not be started.
+// A status of 126 or 127 without output means that the shell could not start the command.
 class LinuxCommandRunner final : public CommandRunner {
  public:
   LinuxCommandRunner();

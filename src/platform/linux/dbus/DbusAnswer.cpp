@@ -31,7 +31,7 @@ const char* signatureOf(const Value& value) {
   return "";
 }
 
-// Appends to a message; false as soon as the library refuses something.
+// Appends values to a message. Each function returns false when the library refuses a value.
 class Appender {
  public:
   explicit Appender(sd_bus_message* message) : message_(message) {}

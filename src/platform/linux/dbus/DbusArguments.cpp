@@ -16,9 +16,9 @@
 namespace tonewerk {
 namespace {
 
-// A frame and its list of parameters, in which an argument lies on the socket.
+// The depth of an argument on the socket: inside a frame and its list of arguments.
 constexpr std::size_t kArgumentDepth = 3;
-// What a text, an array or a map takes beside what it holds.
+// Bytes that a text, an array or a map takes in addition to its content.
 constexpr std::size_t kHeaderBytes = 4;
 
 // The next complete type of a message.
@@ -33,8 +33,8 @@ struct NextType {
   }
 };
 
-// What is wrong with the type that `types` begins with, as it continues "argument 1 (message) ", if something
-// is; takes the type off the front. What a variant in it holds is another matter.
+// Removes one type from the front of `types`. If the type is not allowed, says why, as a text that follows
+// "argument 1 (message) "; else null. Does not check what a variant holds.
 const char* problemOfType(std::string_view& types) {
   const char kind = types.empty() ? '\0' : types.front();
   types.remove_prefix(types.empty() ? 0 : 1);
@@ -57,8 +57,8 @@ const char* problemOfType(std::string_view& types) {
   }
 }
 
-// What the library's own check finds wrong with a text of that kind, as it continues "argument 1 (message) ".
-// It takes the strings that isText() takes, and does not tell one that it refuses from one that is cut off.
+// Why the library refuses a text of that kind, as a text that follows "argument 1 (message) ". The library
+// accepts the same strings as isText(). Its error does not say whether a text is malformed or cut off.
 const char* problemOfText(char kind) {
   switch (kind) {
     case SD_BUS_TYPE_OBJECT_PATH:
@@ -70,8 +70,8 @@ const char* problemOfText(char kind) {
   }
 }
 
-// Reads values up to the first thing that is wrong; then problem() says what it is, as it continues "argument
-// 1 (message) ", and everything read since is worthless.
+// Reads values until the first one that is wrong. problem() then says what is wrong, as a text that follows
+// "argument 1 (message) ", and all values read after it are meaningless.
 class ValueReader {
  public:
   ValueReader(sd_bus_message* message, RpcStrings& texts) : message_(message), texts_(texts) {}
@@ -147,8 +147,8 @@ class ValueReader {
     return found ? std::move(*found) : SharedString();
   }
 
-  // By its type and not only by what there is of it: there may be nothing.
-  bool isWelcome(std::string_view types) {
+  // Checks the type and not only the values, because there may be none.
+  bool isAllowed(std::string_view types) {
     if (types.starts_with(SD_BUS_TYPE_VARIANT)) return fail("holds a variant in a variant");
     const char* problem = problemOfType(types);
     return problem == nullptr || fail(problem);
@@ -158,10 +158,10 @@ class ValueReader {
     return sd_bus_message_enter_container(message_, kind, contents.c_str()) > 0 || malformed();
   }
   bool leave() { return !hasFailed() && (sd_bus_message_exit_container(message_) >= 0 || malformed()); }
-  bool isDeepEnough(std::size_t depth) {
+  bool isWithinDepth(std::size_t depth) {
     return depth <= kMaxFrameDepth || fail("is nested deeper than 32", true);
   }
-  // More elements in the array that was entered last.
+  // True while the array that was entered last has more elements.
   bool hasMore() {
     if (hasFailed()) return false;
     const int atEnd = sd_bus_message_at_end(message_, 0);
@@ -169,12 +169,12 @@ class ValueReader {
     return atEnd == 0;
   }
 
-  // `depth` is that of the value if it is an array or a map.
+  // `depth` is the depth that the value has if it is an array or a map.
   Value value(std::size_t depth) {
     NextType type;
     if (!next(type)) return {};
     if (type.kind != SD_BUS_TYPE_VARIANT) return plain(type, depth);
-    if (!count(kHeaderBytes) || !isWelcome(type.contents) || !enter(SD_BUS_TYPE_VARIANT, type.contents))
+    if (!count(kHeaderBytes) || !isAllowed(type.contents) || !enter(SD_BUS_TYPE_VARIANT, type.contents))
       return {};
     NextType content;
     if (!next(content)) return {};
@@ -218,7 +218,7 @@ class ValueReader {
     }
   }
 
-  // As the socket's reader has it: unsigned only where it must be.
+  // Unsigned only when the value does not fit into a signed integer, as on the socket.
   static Value unsignedInteger(std::uint64_t number) {
     constexpr auto kMaxSigned = static_cast<std::uint64_t>(std::numeric_limits<std::int64_t>::max());
     return number > kMaxSigned ? Value(number) : Value(static_cast<std::int64_t>(number));
@@ -235,7 +235,7 @@ class ValueReader {
   // `contents` is the dictionary's entry type in braces.
   Value map(const std::string& contents, std::size_t depth) {
     ValueMap map;
-    if (!isDeepEnough(depth) || !count(kHeaderBytes) || !enter(SD_BUS_TYPE_ARRAY, contents)) return {};
+    if (!isWithinDepth(depth) || !count(kHeaderBytes) || !enter(SD_BUS_TYPE_ARRAY, contents)) return {};
     const std::string entry = contents.substr(1, contents.size() - 2);
     while (hasMore() && enter(SD_BUS_TYPE_DICT_ENTRY, entry)) {
       SharedString key = shared(texts_.keys, text(SD_BUS_TYPE_STRING));
@@ -248,15 +248,15 @@ class ValueReader {
   }
 
   Value array(const std::string& contents, std::size_t depth) {
-    if (!isDeepEnough(depth) || !count(kHeaderBytes) || !enter(SD_BUS_TYPE_ARRAY, contents)) return {};
+    if (!isWithinDepth(depth) || !count(kHeaderBytes) || !enter(SD_BUS_TYPE_ARRAY, contents)) return {};
     std::vector<Value> values;
     while (hasMore()) values.push_back(value(depth + 1));
     leave();
     return Value(ValueArray(std::move(values)));
   }
 
-  // None when it is empty: D-Bus has no nil. The library reads arrays in one piece only where they are in
-  // this machine's byte order.
+  // None when the list is empty, because D-Bus has no nil. Reads each element by itself, because the library
+  // reads an array in one piece only if it is in this machine's byte order.
   Argument int64List() {
     if (!count(kHeaderBytes) || !enter(SD_BUS_TYPE_ARRAY, "x")) return std::nullopt;
     std::vector<Value> values;

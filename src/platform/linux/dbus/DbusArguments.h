@@ -12,22 +12,21 @@ struct sd_bus_message;
 
 namespace tonewerk {
 
-// What a call brought, or what is wrong with it in words that name the argument.
+// A call's arguments, or the problem with them in a text that names the argument.
 struct DbusArguments {
   Arguments arguments;
-  std::size_t wireBytes = 0;  // about; of what has been read
+  std::size_t wireBytes = 0;  // approximate; of what has been read
   std::optional<ReplyError> problem;
 };
 
-// Reads a call's arguments. What a variant may hold: booleans, integers of all widths, doubles, texts, object
-// paths and signatures (as texts), dates (a struct of one double), arrays, dictionaries with text keys. Not:
-// other structs, file descriptors, a variant that is nothing but another variant's content. A key given
-// twice: the last wins.
+// Reads a call's arguments. A variant may hold booleans, integers of all widths, doubles, texts, object paths
+// and signatures (as texts), dates (a struct of one double), arrays, and dictionaries with text keys. It may
+// not hold other structs, file descriptors, or directly another variant. Of equal keys the last one counts.
 //
-// The bounds are those of a frame on the socket: so many bytes, so many arrays and maps inside each other.
-// Past them the problem is "over a limit".
+// The limits are those of a frame on the socket: kMaxFrameBytes and kMaxFrameDepth. Beyond them the problem
+// has the code kOverLimit.
 //
-// `texts` are those the bus's thread shares.
+// `texts` are the caches of the bus's thread.
 [[nodiscard]] DbusArguments readDbusArguments(sd_bus_message* call, const DbusInterface::Entry& entry,
                                               const Method& method, RpcStrings& texts);
 

@@ -13,8 +13,7 @@
 namespace tonewerk {
 namespace {
 
-// What a request holds while it is under way: the message itself, which its answer needs, and what has been
-// made of it.
+// The bytes that a request holds until it has finished: its message, which the answer needs, and its values.
 std::size_t bytesHeldBy(const DbusArguments& read) {
   std::size_t bytes = read.wireBytes + read.arguments.capacity() * sizeof(Argument);
   for (const Argument& argument : read.arguments) {
@@ -30,12 +29,12 @@ DbusConnection::DbusConnection(const DbusConnectionContext& context, std::uint64
     : context_(context),
       identifier_(identifier),
       name_(std::move(name)),
-      load_(std::make_shared<RequestWindow>(context.waker, identifier)),
+      window_(std::make_shared<RequestWindow>(context.waker, identifier)),
       outbox_(std::make_shared<DbusOutbox>(context.waker, identifier)) {}
 
 DbusConnection::~DbusConnection() {
   outbox_->close();
-  if (context_.memory != nullptr) context_.memory->clientWent();
+  if (context_.memory != nullptr) context_.memory->clientEnded();
 }
 
 std::string DbusConnection::description() const {
@@ -50,24 +49,25 @@ void DbusConnection::exportObject(const RequestSet&, std::shared_ptr<RequestHand
 
 void DbusConnection::resume() {
   isResumed_ = true;
-  handOverWaiting();
+  dispatchWaiting();
 }
 
-std::optional<ReplyError> DbusConnection::take(sd_bus_message* call, const DbusInterface::Entry& entry) {
-  if (isTurnedAway_) return messagingError(kNotPermitted, "the service does not take this client");
-  if (!load_->hasRoom(outbox_->unsentBytes())) {
+std::optional<ReplyError> DbusConnection::handleCall(sd_bus_message* call,
+                                                     const DbusInterface::Entry& entry) {
+  if (isRejected_) return messagingError(kNotPermitted, "the service does not take this client");
+  if (!window_->hasRoom(outbox_->unsentBytes())) {
     return messagingError(kOverLimit, "too many requests of this client are under way");
   }
   const Method& method = context_.interface.methodOf(entry);
   DbusArguments read = readDbusArguments(call, entry, method, context_.texts);
-  if (context_.memory != nullptr) context_.memory->clientBrought(read.wireBytes);
+  if (context_.memory != nullptr) context_.memory->clientSent(read.wireBytes);
   if (read.problem) return std::move(read.problem);
-  InFlightToken token = load_->start(bytesHeldBy(read) + method.replyBytes);
-  handOver({entry.place, std::move(read.arguments), replyTo(call, method.result.type), std::move(token)});
+  InFlightToken token = window_->start(bytesHeldBy(read) + method.replyBytes);
+  dispatch({entry.index, std::move(read.arguments), replyTo(call, method.result.type), std::move(token)});
   return std::nullopt;
 }
 
-// An empty one when nobody waits for an answer.
+// An empty reply when the caller does not want an answer.
 Reply DbusConnection::replyTo(sd_bus_message* call, ResultType result) {
   if (result == ResultType::kNever || sd_bus_message_get_expect_reply(call) <= 0) return {};
   const std::uint32_t number = nextCall_++;
@@ -75,20 +75,20 @@ Reply DbusConnection::replyTo(sd_bus_message* call, ResultType result) {
   return {std::make_shared<DbusReply>(outbox_, number), number};
 }
 
-void DbusConnection::handOver(Request request) {
+void DbusConnection::dispatch(Request request) {
   if (!isAccepted_ || !isResumed_) {
     waiting_.push_back(std::move(request));
     return;
   }
-  // Held here, too: what the request leads to may end the connection.
+  // Kept alive here, because the request may end the connection.
   const std::shared_ptr<RequestHandler> object = object_;
   object->handleRequest(request.method, std::move(request.arguments), std::move(request.reply),
                         std::move(request.token));
 }
 
-void DbusConnection::handOverWaiting() {
+void DbusConnection::dispatchWaiting() {
   if (!isAccepted_ || !isResumed_) return;
-  for (Request& request : std::exchange(waiting_, {})) handOver(std::move(request));
+  for (Request& request : std::exchange(waiting_, {})) dispatch(std::move(request));
 }
 
 void DbusConnection::identify(DbusPeer peer) {
@@ -96,9 +96,9 @@ void DbusConnection::identify(DbusPeer peer) {
   peer_ = peer;
   infoLog(context_.log, "new %@", *this);
   isAccepted_ = context_.delegate.listenerShouldAcceptNewConnection(*this) && object_ != nullptr;
-  if (isAccepted_) return handOverWaiting();
+  if (isAccepted_) return dispatchWaiting();
   infoLog(context_.log, "%@ was turned away", *this);
-  isTurnedAway_ = true;
+  isRejected_ = true;
   const ReplyError error = messagingError(kNotPermitted, "the service does not take this client");
   for (Request& request : std::exchange(waiting_, {})) request.reply(error);
 }
@@ -113,7 +113,7 @@ bool DbusConnection::sendNext(sd_bus* bus) {
   if (!outcome->isAnswered) return true;
   const BusMessage answer = makeDbusAnswer(call.message.get(), call.result, outcome->error, outcome->result);
   const int result = answer == nullptr ? -ENOMEM : sd_bus_send(bus, answer.get(), nullptr);
-  // A bus that is gone says so when it is processed next.
+  // When the bus is gone, the next sd_bus_process() reports it.
   if (result < 0 && result != -ENOTCONN) {
     errorLog(context_.log, "cannot answer %@: %@", *this, std::generic_category().message(-result));
   }

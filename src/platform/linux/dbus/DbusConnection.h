@@ -23,31 +23,32 @@ namespace tonewerk {
 
 class AllocatorReclaimer;
 
-// What the clients on one bus share.
+// Shared by all clients on one bus.
 struct DbusConnectionContext {
   const DbusInterface& interface;
   MessagingListenerDelegate& delegate;
   std::shared_ptr<IoWaker> waker;
   RpcStrings& texts;
   const LogCategory& log;
-  AllocatorReclaimer* memory;  // told of what clients bring, and of their ends; may be null
+  // Learns how many bytes a client has sent, and when it is gone. May be null.
+  AllocatorReclaimer* memory;
 };
 
-// Who is behind a name on the bus, as the bus says.
+// The process behind a name on the bus, as the bus reports it.
 struct DbusPeer {
-  std::int32_t processIdentifier = 0;  // 0 when the bus does not say: the peer was gone before it was asked
+  std::int32_t processIdentifier = 0;  // 0 when the bus does not know it, because the peer is gone
   std::uint32_t userIdentifier = kNoUser;
 };
 
-// One client on the bus, on the bus's thread: a unique name that has made a request.
+// Serves one client on the bus, on the bus's thread. A client is a unique name that has made a request.
 //
-//   take() ... take()   requests wait
-//   identify()          the delegate is asked, and the requests go to the exported object
-//   take() ...          requests go there at once
-//   end()               the name has vanished, or the bus has
+//   handleCall() ... handleCall()   requests wait
+//   identify()                      the delegate accepts the client; the requests go to the exported object
+//   handleCall() ...                requests go to the object at once
+//   end()                           the name has vanished, or the bus is gone
 //
-// The bus is shared, so it cannot be left unread for one client alone as a socket can: what goes past the
-// bounds of RequestWindow is refused.
+// All clients share the bus, so the connection cannot stop reading for one of them as it can on a socket. It
+// refuses requests beyond the bounds of RequestWindow.
 class DbusConnection final : public MessagingConnection {
  public:
   // `context` outlives the connection. `identifier` is its number in the waker.
@@ -64,14 +65,14 @@ class DbusConnection final : public MessagingConnection {
   void setInvalidationHandler(std::function<void()> handler) override { invalidated_ = std::move(handler); }
   void resume() override;
 
-  // A call has come. What it is refused for, if it is.
-  [[nodiscard]] std::optional<ReplyError> take(sd_bus_message* call, const DbusInterface::Entry& entry);
-  // The bus has said who the client is. Once.
+  // Handles a call of this client. If it refuses the call, it returns the error.
+  [[nodiscard]] std::optional<ReplyError> handleCall(sd_bus_message* call, const DbusInterface::Entry& entry);
+  // The bus has said who the client is. Later calls do nothing.
   void identify(DbusPeer peer);
   bool isIdentified() const { return isIdentified_; }
-  // Sends one answer; false when there is none.
+  // Sends one answer. False when no answer is waiting.
   [[nodiscard]] bool sendNext(sd_bus* bus);
-  // Ends the connection; its handlers have returned when this does. Once; later calls do nothing.
+  // Ends the connection. Its handlers have returned when this returns. Later calls do nothing.
   void end();
 
  private:
@@ -88,8 +89,8 @@ class DbusConnection final : public MessagingConnection {
   };
 
   [[nodiscard]] Reply replyTo(sd_bus_message* call, ResultType result);
-  void handOver(Request request);
-  void handOverWaiting();
+  void dispatch(Request request);
+  void dispatchWaiting();
 
   const DbusConnectionContext& context_;
   const std::uint64_t identifier_;
@@ -100,15 +101,15 @@ class DbusConnection final : public MessagingConnection {
   std::function<void()> interrupted_;
   std::function<void()> invalidated_;
   bool isIdentified_ = false;
-  bool isTurnedAway_ = false;
+  bool isRejected_ = false;
   bool isAccepted_ = false;
   bool isResumed_ = false;
   bool hasEnded_ = false;
 
-  std::vector<Request> waiting_;  // for the connection to be accepted and resumed
+  std::vector<Request> waiting_;  // until the connection is accepted and resumed
   std::unordered_map<std::uint32_t, Call> calls_;
   std::uint32_t nextCall_ = 0;
-  std::shared_ptr<RequestWindow> load_;
+  std::shared_ptr<RequestWindow> window_;
   std::shared_ptr<DbusOutbox> outbox_;
 };
 

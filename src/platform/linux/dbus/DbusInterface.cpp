@@ -16,10 +16,10 @@ std::string memberOf(std::string_view method) {
   return member;
 }
 
-DbusInterface::Entry entryOf(const Method& method, std::size_t place) {
+DbusInterface::Entry entryOf(const Method& method, std::size_t index) {
   DbusInterface::Entry entry;
   entry.member = memberOf(method.name);
-  entry.place = place;
+  entry.index = index;
   entry.result = dbusSignatureOf(method.result.type);
   for (const Parameter& parameter : method.parameters) {
     entry.signature += dbusSignatureOf(parameter.type);
@@ -33,10 +33,10 @@ DbusInterface::Entry entryOf(const Method& method, std::size_t place) {
   return entry;
 }
 
-// Calls are taken before the library looks for them in the table.
+// Never called for a real call, because the object's handler takes calls before the library reads the table.
 int refuse(sd_bus_message*, void*, sd_bus_error*) { return -EINVAL; }
 
-// For everybody: who may send is the bus's policy.
+// Any user may call: the bus's policy decides who may send.
 constexpr std::uint64_t kAnswered = SD_BUS_VTABLE_UNPRIVILEGED;
 constexpr std::uint64_t kUnanswered = SD_BUS_VTABLE_UNPRIVILEGED | SD_BUS_VTABLE_METHOD_NO_REPLY;
 
@@ -84,9 +84,9 @@ std::string_view dbusSignatureOf(ResultType type) {
 
 DbusInterface::DbusInterface(const RequestSet& methods) : methods_(methods) {
   entries_.reserve(methods.methods.size());
-  for (std::size_t place = 0; place < methods.methods.size(); ++place) {
-    const Method& method = methods.methods[place];
-    if (!method.forOwner) entries_.push_back(entryOf(method, place));
+  for (std::size_t index = 0; index < methods.methods.size(); ++index) {
+    const Method& method = methods.methods[index];
+    if (!method.forOwner) entries_.push_back(entryOf(method, index));
   }
   vtable_.push_back(SD_BUS_VTABLE_START(0));
   for (const Entry& entry : entries_) {

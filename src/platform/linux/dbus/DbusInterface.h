@@ -12,8 +12,8 @@ struct sd_bus_vtable;
 
 namespace tonewerk {
 
-// An exported interface as D-Bus shows it: its methods in upper camel case with the signatures of their
-// parameters and results. Methods for the daemon's owner alone are not among them.
+// Describes an exported interface for D-Bus: its methods in upper camel case, with the signatures of their
+// parameters and results. It leaves out the methods that only the daemon's owner may call.
 //
 //   kInt64 x   kUInt32 u   kUInt16 q   kMap a{sv}   kInt64ListOrNone ax (an empty one is none)
 //   kBoolean b   kUInt16 q   kMap a{sv}   kInt64List ax   kAny v   kNone and kNever nothing
@@ -21,24 +21,24 @@ class DbusInterface {
  public:
   struct Entry {
     std::string member;     // its name on the bus
-    std::size_t place = 0;  // among the methods of the exported interface
+    std::size_t index = 0;  // in the methods of the exported interface
     std::string signature;
     std::string result;
     std::string names;  // of the parameters and the result, each with a zero byte at its end
   };
 
-  // `methods` outlives it.
+  // `methods` outlives the interface.
   explicit DbusInterface(const RequestSet& methods);
   DbusInterface(const DbusInterface&) = delete;
   DbusInterface& operator=(const DbusInterface&) = delete;
   ~DbusInterface();
 
-  // Null when there is none.
+  // Null when the interface has no such member.
   const Entry* find(std::string_view member) const;
-  const Method& methodOf(const Entry& entry) const { return methods_.methods[entry.place]; }
+  const Method& methodOf(const Entry& entry) const { return methods_.methods[entry.index]; }
 
-  // For introspection, as long as this lives. Calls are not taken by it: what it names as their handler takes
-  // none.
+  // For introspection. Valid as long as this object. The handlers in it refuse every call, so calls need
+  // another handler.
   const sd_bus_vtable* vtable() const { return vtable_.data(); }
 
  private:

@@ -45,14 +45,14 @@ void DbusListener::run() {
     {
       DbusService service(names_, address_, context);
       const DbusService::End end = service.serve(isStopping_);
-      tell(end, service.problem());
+      logEnd(end, service.problem());
     }
     if (std::chrono::steady_clock::now() - start >= kLongestPause) pause_.reset();
     pause();
   }
 }
 
-void DbusListener::tell(DbusService::End end, const std::string& problem) {
+void DbusListener::logEnd(DbusService::End end, const std::string& problem) {
   using End = DbusService::End;
   const std::optional<End> before = std::exchange(lastEnd_, end);
   if (end == End::kLost) {
@@ -64,7 +64,7 @@ void DbusListener::tell(DbusService::End end, const std::string& problem) {
   }
 }
 
-// Until it is time to try again, or somebody stops the listener.
+// Waits until it is time to try again or the listener is stopped.
 void DbusListener::pause() {
   const auto end = std::chrono::steady_clock::now() + pause_.next();
   while (!isStopping_) {
@@ -74,7 +74,7 @@ void DbusListener::pause() {
     ::poll(&waited, 1, static_cast<int>(left.count()));
     eventfd_t count = 0;
     static_cast<void>(::eventfd_read(waker_->fileDescriptor(), &count));
-    static_cast<void>(waker_->take());  // of clients that are gone
+    static_cast<void>(waker_->take());  // dropped: the clients are gone
   }
 }
 

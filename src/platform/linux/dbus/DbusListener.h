@@ -18,20 +18,20 @@
 
 namespace tonewerk {
 
-// Serves clients on a D-Bus, all of them on one thread of its own, the bus's thread: one connection for each
-// unique name that makes a request, ended when the name vanishes.
+// Serves clients on a D-Bus, all of them on one thread of its own, the bus's thread. Each unique name that
+// makes a request gets a connection, which ends when the name vanishes.
 //
-// Without a bus it does nothing but to look for it again, after kFirstPause and then ever more rarely, at
-// last every kLongestPause; the same when the bus goes away, which ends every connection, or refuses the
-// name. A name that another has is waited for on the bus.
+// Without a bus it tries to connect again after kFirstPause and then after growing pauses, up to
+// kLongestPause. It does the same when the bus goes away, which ends every connection, and when the bus
+// refuses the name. If another process has the name, it waits for the name on the bus.
 class DbusListener final : public MessagingListener {
  public:
   static constexpr std::chrono::milliseconds kFirstPause{250};
   static constexpr std::chrono::milliseconds kLongestPause{60'000};
 
-  // `methods` and `log` outlive the listener; delegates export objects of these methods. `address` is a D-Bus
-  // address, empty for the system's bus. `memory`, which outlives the listener, is told of what clients
-  // bring, and of their ends.
+  // `methods`, `log` and `memory` outlive the listener. Delegates export objects of these methods. `address`
+  // is a D-Bus address, empty for the system's bus. `memory` learns how many bytes clients send and when a
+  // client is gone. It may be null.
   DbusListener(DbusNames names, const RequestSet& methods, std::string address, const LogCategory& log,
                AllocatorReclaimer* memory = nullptr);
   ~DbusListener() override;
@@ -42,8 +42,8 @@ class DbusListener final : public MessagingListener {
 
  private:
   void run();
-  // Logs why the service has ended, but not the same again with every try.
-  void tell(DbusService::End end, const std::string& problem);
+  // Logs why the service has ended, but does not repeat the same reason with every try.
+  void logEnd(DbusService::End end, const std::string& problem);
   void pause();
 
   const DbusNames names_;
@@ -54,7 +54,7 @@ class DbusListener final : public MessagingListener {
   MessagingListenerDelegate* delegate_ = nullptr;
   const std::shared_ptr<IoWaker> waker_ = std::make_shared<IoWaker>();
 
-  // The bus's thread's.
+  // Used by the bus's thread only.
   RpcStrings texts_;
   GrowingDelay pause_{kFirstPause, kLongestPause};
   std::optional<DbusService::End> lastEnd_;
@@ -64,7 +64,7 @@ class DbusListener final : public MessagingListener {
   std::thread thread_ GUARDED_BY(lifeMutex_);
 };
 
-// The bus that the environment names: the session's, else the system's (empty).
+// The address of the session's bus from the environment; empty, for the system's bus, without one.
 std::string dbusAddressFromEnvironment();
 
 }  // namespace tonewerk

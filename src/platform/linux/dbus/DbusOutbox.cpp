@@ -19,8 +19,8 @@ void DbusOutbox::add(DbusOutcome outcome) {
     if (isClosed_) return;
     unsentBytes_ += bytesOf(outcome);
     unsent_.push_back(std::move(outcome));
-    if (isPutOff_) return;
-    isPutOff_ = true;
+    if (isWakeDeferred_) return;
+    isWakeDeferred_ = true;
   }
   if (!BatchScope::defer(shared_from_this())) endOfBatch();
 }
@@ -28,7 +28,7 @@ void DbusOutbox::add(DbusOutcome outcome) {
 void DbusOutbox::endOfBatch() {
   {
     const MutexLock lock(mutex_);
-    isPutOff_ = false;
+    isWakeDeferred_ = false;
     if (isClosed_) return;
   }
   waker_->wake(client_);

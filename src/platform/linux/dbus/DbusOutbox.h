@@ -15,7 +15,7 @@
 
 namespace tonewerk {
 
-// What came of a call: an answer, or the certainty that there will be none.
+// The outcome of a call: an answer, or the fact that there will be none.
 struct DbusOutcome {
   std::uint32_t call = 0;
   bool isAnswered = false;
@@ -23,10 +23,10 @@ struct DbusOutcome {
   std::optional<Value> result;
 };
 
-// What came of a client's calls, on its way to the bus's thread, which alone may touch the bus. Outlives the
-// client for as long as somebody can still reply; outcomes then go nowhere.
+// Carries the outcomes of a client's calls to the bus's thread, the only one that may use the bus. Lives on
+// after the client as long as a reply may still come; such outcomes are dropped.
 //
-// The bus's thread is woken once a batch of work.
+// Wakes the bus's thread once per batch of work.
 class DbusOutbox final : public BatchScope::Deferred, public std::enable_shared_from_this<DbusOutbox> {
  public:
   // The waker wakes the bus's thread for `client`.
@@ -49,11 +49,11 @@ class DbusOutbox final : public BatchScope::Deferred, public std::enable_shared_
   Mutex mutex_;
   std::deque<DbusOutcome> unsent_ GUARDED_BY(mutex_);
   bool isClosed_ GUARDED_BY(mutex_) = false;
-  bool isPutOff_ GUARDED_BY(mutex_) = false;  // the waking, to the end of a batch
+  bool isWakeDeferred_ GUARDED_BY(mutex_) = false;  // to the end of a batch
 };
 
-// The way back to one call. Only the first answer goes out: a call on the bus has one. When it is destroyed
-// without one, the call is let go.
+// Answers one call. Only the first answer is sent, because a call on the bus has one answer. When it is
+// destroyed without an answer, the outbox is told that there will be none.
 class DbusReply final : public ReplySink {
  public:
   DbusReply(std::shared_ptr<DbusOutbox> outbox, std::uint32_t call)

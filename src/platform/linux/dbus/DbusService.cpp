@@ -19,7 +19,7 @@ namespace {
 constexpr const char* kBusName = "org.freedesktop.DBus";
 constexpr const char* kBusPath = "/org/freedesktop/DBus";
 
-// What the bus answers to a request for a name.
+// The bus's answers to a request for a name.
 constexpr std::uint32_t kIsOwner = 1;
 constexpr std::uint32_t kIsInQueue = 2;
 
@@ -70,14 +70,14 @@ struct DbusService::Handlers {
     if (interface != nullptr && interface != service.names_.interface) return 0;
     const char* member = sd_bus_message_get_member(call);
     const DbusInterface::Entry* entry = service.context_.interface.find(member);
-    if (entry == nullptr) return 0;  // the library says so
+    if (entry == nullptr) return 0;  // the library answers with an error
     const std::optional<ReplyError> problem = service.request(call, *entry);
     return problem ? refuse(error, *problem) : 1;
   }
 
   static int nameAnswered(sd_bus_message* answer, void* data, sd_bus_error*) {
     auto& service = *static_cast<DbusService*>(data);
-    // Of a bus that is lost before it answers, the library says so itself.
+    // If the bus is lost before it answers, the library makes this answer itself.
     service.isReached_ = sd_bus_message_is_method_error(answer, SD_BUS_ERROR_NO_REPLY) == 0;
     std::uint32_t result = 0;
     if (isError(answer) || sd_bus_message_read(answer, "u", &result) <= 0) {
@@ -104,7 +104,7 @@ struct DbusService::Handlers {
   static int identityAnswered(sd_bus_message* answer, void* data, sd_bus_error*) {
     auto& client = *static_cast<Client*>(data);
     if (sd_bus_message_is_method_error(answer, SD_BUS_ERROR_NAME_HAS_NO_OWNER) > 0) {
-      return vanished(answer, data, nullptr);  // before the rule was there
+      return vanished(answer, data, nullptr);  // before the match rule was active
     }
     client.connection.identify(isError(answer) ? DbusPeer() : peerOf(answer));
     return 0;
@@ -118,7 +118,7 @@ struct DbusService::Handlers {
     return 0;
   }
 
-  // What it asked for before it went is still done, as on the socket.
+  // Requests from before the client vanished are still carried out, as on the socket.
   static int vanished(sd_bus_message*, void* data, sd_bus_error*) {
     auto& client = *static_cast<Client*>(data);
     client.connection.identify({});
@@ -146,17 +146,17 @@ DbusService::End DbusService::serve(const std::atomic<bool>& isStopping) {
     const bool mustSend = isFull();
     if (!mustSend) {
       const int result = sd_bus_process(bus_.get(), nullptr);
-      if (result < 0) return lose(result);
+      if (result < 0) return endLost(result);
       if (isRefused_) return isReached_ ? End::kRefused : End::kNoBus;
       if (result > 0) continue;
     }
     if (!wait(mustSend) || !mustSend) continue;
-    if (const int result = sd_bus_process(bus_.get(), nullptr); result < 0) return lose(result);
+    if (const int result = sd_bus_process(bus_.get(), nullptr); result < 0) return endLost(result);
   }
   return End::kStopped;
 }
 
-DbusService::End DbusService::lose(int result) {
+DbusService::End DbusService::endLost(int result) {
   problem_ = std::generic_category().message(-result);
   return isReached_ ? End::kLost : End::kNoBus;
 }
@@ -167,7 +167,7 @@ bool DbusService::start() {
     if (result < 0) problem_ = std::generic_category().message(-result);
     return result >= 0;
   };
-  // The handler of the object comes first and takes the calls; the table beside it is for introspection.
+  // The object's handler is called first and takes the calls. The table is for introspection only.
   return isFine(sd_bus_add_object(bus, nullptr, names_.path.c_str(), Handlers::call, this)) &&
          isFine(sd_bus_add_object_vtable(bus, nullptr, names_.path.c_str(), names_.interface.c_str(),
                                          context_.interface.vtable(), this)) &&
@@ -177,8 +177,8 @@ bool DbusService::start() {
                                           Handlers::nameAnswered, this));
 }
 
-// What was sent and not taken by the bus is few messages, so that it cannot grow; answers wait with their
-// clients, and count against their bounds.
+// Nothing more is sent while the bus has not taken what was sent, so the library's queue cannot grow. Answers
+// wait in their clients' outboxes, and count against the clients' bounds.
 bool DbusService::isFull() const {
   std::uint64_t unsent = 0;
   return sd_bus_is_ready(bus_.get()) > 0 && sd_bus_get_n_queued_write(bus_.get(), &unsent) >= 0 && unsent > 0;
@@ -186,7 +186,7 @@ bool DbusService::isFull() const {
 
 bool DbusService::wait(bool onlyToSend) const {
   const int events = onlyToSend ? POLLOUT : sd_bus_get_events(bus_.get());
-  if (events < 0) return true;  // processing it says why
+  if (events < 0) return true;  // sd_bus_process() then returns the error
   std::array<pollfd, 2> waited = {pollfd{context_.waker->fileDescriptor(), POLLIN, 0},
                                   pollfd{sd_bus_get_fd(bus_.get()), static_cast<short>(events), 0}};
   const auto timeout = timeToNextBusWork(bus_.get());
@@ -212,7 +212,7 @@ std::optional<ReplyError> DbusService::request(sd_bus_message* call, const DbusI
   const char* sender = sd_bus_message_get_sender(call);
   Client* client = sender == nullptr ? nullptr : clientNamed(sender);
   if (client == nullptr) return messagingError(kOverLimit, "the service has too many clients");
-  return client->connection.take(call, entry);
+  return client->connection.handleCall(call, entry);
 }
 
 DbusService::Client* DbusService::clientNamed(const std::string& name) {
@@ -227,8 +227,8 @@ DbusService::Client* DbusService::clientNamed(const std::string& name) {
   return clients_.emplace(name, std::move(client)).first->second.get();
 }
 
-// The rule is sent before the question, so a client that is there when the question is answered does not
-// vanish unnoticed.
+// The match rule is sent before the query, so the service notices when a client vanishes after the query was
+// answered.
 bool DbusService::watch(Client& client) {
   const std::string rule =
       "type='signal',sender='org.freedesktop.DBus',path='/org/freedesktop/DBus',"

@@ -12,69 +12,70 @@
 
 namespace tonewerk {
 
-// Where a service is found on a bus.
+// The names under which a service is found on a bus.
 struct DbusNames {
   std::string name;
   std::string path;
   std::string interface;
 };
 
-// The service's time on one bus, from the connection to its loss; on the bus's thread.
+// Serves clients on one bus connection until it is lost, on the bus's thread.
 //
 //   serve()   connects, exports the interface, asks for the name, then takes calls and sends answers
-//   bus  ->   a call             -> its sender's DbusConnection, made at its first
+//   bus  ->   a call             -> its sender's DbusConnection, which the first call makes
 //        ->   a name vanishes    -> its DbusConnection ends
-//        <-   answers of any thread, by the connections' outboxes
+//        <-   answers of any thread, through the connections' outboxes
 //
-// While the bus does not take what was sent, nothing more is read from it. Nothing here waits for an answer.
+// While the bus does not take what was sent, nothing more is read from it. No function waits for an answer of
+// the bus.
 class DbusService {
  public:
-  // Clients at once. Each takes a match rule of the bus, of which a system bus grants 512.
+  // The most clients at once. Each needs a match rule of the bus, and a system bus allows 512 of them.
   static constexpr std::size_t kMaxClients = 256;
 
   enum class End {
-    kStopped,  // somebody set `isStopping`
+    kStopped,  // `isStopping` was set
     kNoBus,    // the bus was never reached
-    kRefused,  // it does not give us the name
-    kLost,     // it is gone
+    kRefused,  // the bus does not give this process the name
+    kLost,     // the bus is gone
   };
 
-  // `names` and `context` outlive the service. `address` as openBus() takes it.
+  // `names` and `context` outlive the service. `address` is as in openBus().
   DbusService(const DbusNames& names, const std::string& address, const DbusConnectionContext& context);
   DbusService(const DbusService&) = delete;
   DbusService& operator=(const DbusService&) = delete;
   // Ends every connection.
   ~DbusService();
 
-  // Until the bus is lost, or `isStopping` is set and the waker woken.
+  // Returns when the bus is lost, or when `isStopping` is set and the waker is signalled.
   [[nodiscard]] End serve(const std::atomic<bool>& isStopping);
-  // Why serve() came back, for the log.
+  // Why serve() returned, for the log.
   const std::string& problem() const { return problem_; }
 
  private:
-  // Callbacks of the library get a pointer to the client they are for.
+  // The library passes a pointer to the client to its callbacks.
   struct Client {
     DbusService& service;
     const std::uint64_t identifier;
     DbusConnection connection;
     std::string name;
     BusSlot vanishing;  // the match rule
-    BusSlot identity;   // the question
+    BusSlot identity;   // the query for its credentials
   };
 
-  // What the library calls.
+  // The library's callbacks.
   struct Handlers;
 
   [[nodiscard]] bool start();
-  [[nodiscard]] End lose(int result);
+  [[nodiscard]] End endLost(int result);
   bool isFull() const;
-  // Waits for the bus, the waker or the time. True when the bus is ready.
+  // Waits for the bus, the waker or the library's next time-out. True when the bus is ready.
   [[nodiscard]] bool wait(bool onlyToSend) const;
   void takeWakes();
   void sendAnswers();
 
   [[nodiscard]] std::optional<ReplyError> request(sd_bus_message* call, const DbusInterface::Entry& entry);
-  // Null when there are too many, or the bus does not answer.
+  // Finds or makes the client. Null when there are too many clients or the library cannot watch it.
   [[nodiscard]] Client* clientNamed(const std::string& name);
   [[nodiscard]] bool watch(Client& client);
   void remove(Client& client);
@@ -87,7 +88,7 @@ class DbusService {
   std::uint64_t nextIdentifier_ = 1;
 
   Bus bus_;
-  // After the bus: they hold what is the bus's.
+  // Declared after the bus, because they hold objects of the bus.
   std::unordered_map<std::string, std::unique_ptr<Client>> clients_;
   std::unordered_map<std::uint64_t, Client*> byIdentifier_;
   std::deque<std::uint64_t> answering_;  // clients that may have answers to send

@@ -12,14 +12,14 @@ namespace {
 
 constexpr std::chrono::microseconds kLongestWait = std::chrono::minutes(1);
 
-// As the library has it.
+// The same address as the library's default.
 std::string systemBusAddress() {
   const char* address = ::secure_getenv("DBUS_SYSTEM_BUS_ADDRESS");
   return address == nullptr ? "unix:path=/run/dbus/system_bus_socket" : address;
 }
 
-// File descriptors are declined, and messages with some then stay with the bus: held messages could otherwise
-// use up this process's.
+// Does not accept file descriptors, so the bus refuses messages that contain some. Held messages could
+// otherwise use up this process's descriptors.
 int startAt(sd_bus* bus, const std::string& address) {
   if (const int result = sd_bus_set_address(bus, address.c_str()); result < 0) return result;
   if (const int result = sd_bus_set_bus_client(bus, 1); result < 0) return result;

@@ -11,8 +11,8 @@ struct sd_bus_slot;
 
 namespace tonewerk {
 
-// Owners of the D-Bus library's objects. Neither they nor what hangs on one bus connection may be used, or
-// let go, on two threads at once.
+// Own the D-Bus library's objects. The objects of one bus connection may not be used or destroyed on two
+// threads at once.
 struct BusCloser {
   void operator()(sd_bus* bus) const;
 };
@@ -26,12 +26,12 @@ using Bus = std::unique_ptr<sd_bus, BusCloser>;
 using BusMessage = std::unique_ptr<sd_bus_message, BusMessageReleaser>;
 using BusSlot = std::unique_ptr<sd_bus_slot, BusSlotReleaser>;
 
-// Begins to connect to the bus at this D-Bus address, the system's bus when it is empty. Does not wait for
-// it: that nobody answers shows when the bus is processed. Null, and why in `problem`, when it cannot even
-// begin.
+// Starts to connect to the bus at this D-Bus address; an empty address means the system's bus. Does not wait
+// for the connection: if the bus does not answer, processing it fails later. Null, with the reason in
+// `problem`, when it cannot start.
 [[nodiscard]] Bus openBus(const std::string& address, std::string& problem);
 
-// How long the bus can be left alone, unless its descriptor becomes ready before: at most a minute.
+// How long the bus needs no processing, unless its descriptor becomes ready earlier. At most a minute.
 std::chrono::milliseconds timeToNextBusWork(sd_bus* bus);
 
 }  // namespace tonewerk

@@ -12,7 +12,7 @@
 
 namespace tonewerk {
 
-// The kernel's list of descriptors that somebody waits on. Each is known by a number of the caller's choice.
+// Waits for several descriptors at once (epoll). The caller chooses a number for each of them.
 class Epoll {
  public:
   struct Event {
@@ -28,11 +28,11 @@ class Epoll {
   bool change(int descriptor, std::uint64_t identifier, std::uint32_t events) {
     return control(EPOLL_CTL_MOD, descriptor, identifier, events);
   }
-  // Does nothing for a descriptor that is not in the list.
+  // Does nothing for a descriptor that was not added.
   void remove(int descriptor) { static_cast<void>(control(EPOLL_CTL_DEL, descriptor, 0, 0)); }
 
-  // Waits until something is ready or the time is up; without a time-out as long as it takes. The events are
-  // valid until the next call; none when the time is up or a signal came.
+  // Waits until a descriptor is ready or the time is up; without a time-out there is no limit. The events are
+  // valid until the next call. There are none when the time is up or a signal interrupted the wait.
   std::span<const Event> wait(std::optional<std::chrono::milliseconds> timeout) {
     std::array<epoll_event, kMaxAtOnce> ready;
     const int count = ::epoll_wait(descriptor_.get(), ready.data(), kMaxAtOnce,

@@ -21,7 +21,8 @@ class FileDescriptor {
   int get() const { return descriptor_; }
   explicit operator bool() const { return descriptor_ >= 0; }
 
-  // Closes what is held. What close() reports is of no use here: nothing was written that must last.
+  // Closes the descriptor it owns and takes `descriptor`. Errors of close() are ignored: use it only where no
+  // written data depends on them.
   void reset(int descriptor = -1) {
     if (descriptor_ >= 0) ::close(descriptor_);
     descriptor_ = descriptor;

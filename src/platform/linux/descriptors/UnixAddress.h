@@ -8,8 +8,7 @@
 
 namespace tonewerk {
 
-// The address of a Unix socket in the file system; none for a path that is empty or longer than an address
-// can be.
+// The address of a Unix socket in the file system. None when the path is empty or too long for an address.
 [[nodiscard]] inline std::optional<sockaddr_un> unixAddressOf(const std::string& path) {
   sockaddr_un address{};
   if (path.empty() || path.size() >= sizeof(address.sun_path)) return std::nullopt;

@@ -10,10 +10,11 @@
 
 namespace tonewerk {
 
-// Wakes a thread that polls. Once is enough until it has woken. Any thread, but for open() and close().
+// Wakes a thread that polls fileDescriptor(). Signals before clear() count as one. Any thread, except open()
+// and close().
 class WakeEvent {
  public:
-  // False without descriptors.
+  // False when the system has no descriptor left.
   bool open() {
     event_.reset(::eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK));
     return static_cast<bool>(event_);

@@ -16,7 +16,8 @@ std::optional<std::string> setVariable(const Directories::Environment& environme
   return value && !value->empty() ? value : std::nullopt;
 }
 
-// The service manager's variable: one directory, or several separated by colons, of which the first is ours.
+// From the service manager's variable, which holds one directory or several separated by colons. The first
+// one is used.
 std::optional<std::string> serviceDirectory(const Directories::Environment& environment, const char* name) {
   std::optional<std::string> value = setVariable(environment, name);
   if (!value) return std::nullopt;
@@ -25,8 +26,8 @@ std::optional<std::string> serviceDirectory(const Directories::Environment& envi
   return value->empty() ? std::nullopt : value;
 }
 
-// A base directory that the user chose. Relative ones mean nothing to a daemon and are ignored, as the
-// convention for these variables has it.
+// Below a base directory that the user chose. Relative paths are ignored, as the XDG Base Directory
+// Specification requires.
 std::optional<std::string> userDirectory(const Directories::Environment& environment, const char* name) {
   const std::optional<std::string> base = setVariable(environment, name);
   if (!base || base->front() != '/') return std::nullopt;
@@ -51,25 +52,25 @@ Directories Directories::fromEnvironment() { return from(processVariable, geteui
 Directories Directories::from(const Environment& environment, uid_t user) {
   const bool isRoot = user == 0;
   const std::string home = setVariable(environment, "HOME").value_or("");
-  // The service manager's variable, else the user's base directory, else root's or the user's own place.
-  const auto choose = [&](const char* service, const char* base, const std::string& otherwise) {
+  // The service manager's variable, else the user's base directory, else the given default.
+  const auto choose = [&](const char* service, const char* base, const std::string& fallback) {
     if (const auto directory = serviceDirectory(environment, service)) return *directory;
     if (const auto directory = userDirectory(environment, base)) return *directory;
-    return otherwise;
+    return fallback;
   };
 
-  const Directories byRoot = system();
+  const Directories defaults = system();
   Directories chosen;
   chosen.runtime = choose("RUNTIME_DIRECTORY", "XDG_RUNTIME_DIR",
-                          isRoot ? byRoot.runtime : "/run/user/" + std::to_string(user) + kName);
+                          isRoot ? defaults.runtime : "/run/user/" + std::to_string(user) + kName);
   chosen.state =
-      choose("STATE_DIRECTORY", "XDG_STATE_HOME", isRoot ? byRoot.state : home + "/.local/state" + kName);
+      choose("STATE_DIRECTORY", "XDG_STATE_HOME", isRoot ? defaults.state : home + "/.local/state" + kName);
   chosen.configuration = choose("CONFIGURATION_DIRECTORY", "XDG_CONFIG_HOME",
-                                isRoot ? byRoot.configuration : home + "/.config" + kName);
-  // Whoever sends root's state elsewhere does not want its logs in the system's place.
-  const std::string besideState =
-      isRoot && chosen.state == byRoot.state ? byRoot.logs : chosen.state + "/logs";
-  chosen.logs = serviceDirectory(environment, "LOGS_DIRECTORY").value_or(besideState);
+                                isRoot ? defaults.configuration : home + "/.config" + kName);
+  // When root's state directory is not the default, the logs go below it and not into the system's directory.
+  const std::string defaultLogs =
+      isRoot && chosen.state == defaults.state ? defaults.logs : chosen.state + "/logs";
+  chosen.logs = serviceDirectory(environment, "LOGS_DIRECTORY").value_or(defaultLogs);
   return chosen;
 }
 

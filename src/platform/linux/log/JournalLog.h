@@ -10,16 +10,17 @@
 
 namespace tonewerk {
 
-// The log as entries of the system's journal. Besides MESSAGE (the line with its prefix) and PRIORITY an
-// entry has SYSLOG_IDENTIFIER, TONEWERK_SUBSYSTEM, TONEWERK_CATEGORY and TONEWERK_LEVEL, to search by:
+// Writes the log as entries of the system's journal. Besides MESSAGE (the line with its prefix) and PRIORITY
+// an entry has the fields SYSLOG_IDENTIFIER, TONEWERK_SUBSYSTEM, TONEWERK_CATEGORY and TONEWERK_LEVEL for
+// searching:
 //
 //   journalctl TONEWERK_CATEGORY=twrr
 class JournalLog final : public Log {
  public:
   explicit JournalLog(LogThreshold threshold) : threshold_(std::move(threshold)) {}
 
-  // Whether `journalStream`, the value of JOURNAL_STREAM ("device:inode"), names what `fileDescriptor` is
-  // open on: then that is the journal, and whoever writes there may as well write entries.
+  // True when `journalStream`, the value of JOURNAL_STREAM ("device:inode"), names the file behind
+  // `fileDescriptor`. What is written there then reaches the journal, so entries can be written instead.
   static bool isJournal(std::string_view journalStream, int fileDescriptor);
 
   bool isEnabled(std::string_view category, LogLevel level) const override {
@@ -28,7 +29,7 @@ class JournalLog final : public Log {
   void write(std::string_view subsystem, std::string_view category, LogLevel level,
              std::string_view message) override;
 
-  // An entry's fields, "NAME=value" each.
+  // The fields of an entry, each as "NAME=value".
   static std::array<std::string, 6> fields(std::string_view subsystem, std::string_view category,
                                            LogLevel level, std::string_view message);
 

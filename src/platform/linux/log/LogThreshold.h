@@ -11,17 +11,18 @@
 
 namespace tonewerk {
 
-// From which level on lines are written: one level for all categories, others for some. Any thread reads it.
+// Decides which lines are written: a lowest level for all categories, and other levels for single categories.
+// Any thread may read it.
 class LogThreshold {
  public:
   LogThreshold() = default;
   explicit LogThreshold(LogLevel level) : level_(level) {}
 
-  // Out of a text such as "info" or "twrr=debug,twrs=error,default"; what comes later in a list wins. None
-  // for anything else, an empty text included; `problem` then says what is wrong with it.
+  // Parses a text such as "info" or "twrr=debug,twrs=error,default". Of several levels for the same category
+  // the last one counts. None for any other text, also an empty one; `problem` then says what is wrong.
   [[nodiscard]] static std::optional<LogThreshold> parse(std::string_view text, std::string& problem);
 
-  // A comparison, or a few for categories that have a level of their own. Allocates nothing.
+  // Compares the category with each that has its own level. Allocates nothing.
   bool isEnabled(std::string_view category, LogLevel level) const;
 
  private:

@@ -10,22 +10,22 @@
 
 namespace tonewerk {
 
-// The last lines of something that goes on. Any thread.
+// Keeps the last lines of a text that grows without end. Any thread.
 class RecentLines {
  public:
   struct Limits {
     std::size_t lines = 1000;
     std::size_t bytes = std::size_t{256} << 10;
-    std::size_t lineBytes = 4096;  // longer ones are cut; not above `bytes`
+    std::size_t lineBytes = 4096;  // longer lines are cut; at most `bytes`
   };
 
   RecentLines() : RecentLines(Limits()) {}
   explicit RecentLines(const Limits& limits) : limits_(limits) {}
 
-  // With or without a newline at its end.
+  // `line` may end with a newline or not.
   void add(std::string_view line);
 
-  // Oldest first, a newline behind each.
+  // The lines, oldest first, each with a newline.
   std::string text() const;
 
  private:

@@ -19,7 +19,7 @@ RememberingLog::~RememberingLog() = default;
 
 void RememberingLog::write(std::string_view subsystem, std::string_view category, LogLevel level,
                            std::string_view message) {
-  // Lines quote what tools, files and directories say.
+  // Lines quote tools, files and directories, which need not be UTF-8.
   const std::string text = validUtf8(std::string(message));
   log_->write(subsystem, category, level, text);
   lines_->add(StreamLog::format(clock_.now(), category, level, text));

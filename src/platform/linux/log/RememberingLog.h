@@ -10,8 +10,8 @@ namespace tonewerk {
 class Clock;
 class RecentLines;
 
-// A log that keeps the last lines written to it besides, in the form of StreamLog, for those who ask what
-// went before. A line that is not all UTF-8 is made so first: the journal shows such a one as a blob.
+// Passes lines on to another log and keeps the last ones in `lines`, in the format of StreamLog. Turns each
+// line into valid UTF-8 first, because the journal shows any other line as a blob.
 class RememberingLog final : public Log {
  public:
   // `clock` outlives the log.

@@ -8,9 +8,9 @@
 
 namespace tonewerk {
 
-// The process's log, as its environment wants it: the journal when standard error is the journal's
-// (JOURNAL_STREAM), else lines on standard error; from the level on that TONEWERK_LOG says. A TONEWERK_LOG
-// that says nothing of use is logged as an error and the threshold stays "default". `clock` outlives the log.
+// Makes the process's log from its environment. It writes to the journal when standard error goes there
+// (JOURNAL_STREAM), else to standard error. TONEWERK_LOG sets the threshold; when it cannot be parsed, that
+// is logged as an error and the threshold is "default". `clock` outlives the log.
 [[nodiscard]] std::unique_ptr<Log> makeStandardLog(const Clock& clock);
 
 }  // namespace tonewerk

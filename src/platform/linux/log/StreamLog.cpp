@@ -17,7 +17,7 @@ constexpr int kMaxWaitMilliseconds = 100;
 
 std::string timeText(double at) {
   const double whole = std::floor(at);
-  // Cut, not rounded: a log's time never lies ahead.
+  // Cut and not rounded, so that a log's time is never in the future.
   const int micros = static_cast<int>((at - whole) * 1e6);
   const auto seconds = static_cast<std::time_t>(whole);
   std::tm utc{};

@@ -10,15 +10,15 @@
 
 namespace tonewerk {
 
-// The log as lines of text on an open file, such as standard error:
+// Writes the log as lines of text to an open file, such as standard error:
 //
 //   2026-11-20T10:18:00.123456Z info twrr        TWReportingSession:214   start called. reporterID=77
 //
-// A line is one write(), so that lines of several processes do not mix. A message with newlines is written as
-// it is. Whoever may write to a pipe without a reader ignores SIGPIPE.
+// A line is one write(), so that lines of several processes do not mix. A message with newlines is written
+// unchanged. The process must ignore SIGPIPE if the file may be a pipe without a reader.
 class StreamLog final : public Log {
  public:
-  // Neither closes `fileDescriptor` nor changes it. `clock` outlives the log.
+  // Does not close `fileDescriptor`. `clock` outlives the log.
   StreamLog(int fileDescriptor, const Clock& clock, LogThreshold threshold = LogThreshold());
 
   bool isEnabled(std::string_view category, LogLevel level) const override {
@@ -27,14 +27,14 @@ class StreamLog final : public Log {
   void write(std::string_view subsystem, std::string_view category, LogLevel level,
              std::string_view message) override;
 
-  // The line as it is written, newline included. `at` in seconds since 1970.
+  // The line as it is written, with its newline. `at` is in seconds since 1970.
   static std::string format(double at, std::string_view category, LogLevel level, std::string_view message);
 
  private:
   const int fileDescriptor_;
   const Clock& clock_;
   const LogThreshold threshold_;
-  Mutex mutex_;  // held while a line is written, so that one written in pieces stays whole
+  Mutex mutex_;  // held while a line is written, because it may take several write() calls
 };
 
 }  // namespace tonewerk

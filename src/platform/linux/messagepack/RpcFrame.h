@@ -11,10 +11,10 @@
 
 namespace tonewerk {
 
-// A value that the protocol does not carry, met while a frame was read.
+// A value in a frame that the protocol does not allow.
 struct RefusedValue {
-  std::size_t argument = 0;  // its place among the arguments
-  const char* what = "";     // as it continues "argument 1 (message) "
+  std::size_t argument = 0;  // its index among the arguments
+  const char* what = "";     // the text after "argument 1 (message) "
 };
 
 // One message of the protocol.
@@ -24,15 +24,15 @@ struct RpcFrame {
   Kind kind = Kind::kRequest;
   std::uint32_t identifier = 0;  // of requests and responses
 
-  // Of requests and notifications. With a refused value (the first one met) the arguments hold stand-ins.
+  // Of requests and notifications. Each refused value is replaced by a placeholder among the arguments.
   std::string method;
   Arguments arguments;
 
-  // Of responses; none is nil.
+  // Of responses; nil is read as none.
   std::optional<Value> error;
   std::optional<Value> result;
 
-  std::optional<RefusedValue> refused;
+  std::optional<RefusedValue> refused;  // the first one
   std::size_t wireBytes = 0;
 };
 

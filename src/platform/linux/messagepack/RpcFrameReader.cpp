@@ -12,13 +12,14 @@
 namespace tonewerk {
 namespace {
 
-// The parser keeps a buffer of its own for what a frame's end cut off. It is fed in slices, so that this
-// buffer stays small however many clients are connected; only a long text makes it grow, and it does not stay
-// grown.
+// The parser copies unfinished input into its own buffer. It is fed in slices, so that this buffer stays
+// small however many clients are connected. Only a long text makes it grow, and it is replaced by a small one
+// at the next frame.
 constexpr std::size_t kSliceBytes = 4096;
 constexpr std::size_t kParserBytes = 2 * kSliceBytes + 64;
 
-// The parser can leave its buffer to objects that point into it. Ours copy.
+// The parser can leave its buffer to objects that point into it. The visitor copies everything, so there are
+// none.
 struct NoReferences {
   void operator()(char*) const {}
 };

@@ -10,20 +10,20 @@
 
 namespace tonewerk {
 
-// The texts that all connections of a thread share.
+// Caches of texts that all connections of a thread share.
 struct RpcStrings {
   StringInterner keys{1024, 64};
   StringInterner values{1024, 32};
 };
 
-// Turns a peer's bytes into frames, however they are cut up on their way.
+// Turns a peer's bytes into frames, in whatever pieces they arrive.
 //
 //   bytes -> next() -> kFrame      frame() is a request, a response or a notification
-//                   -> kNeedsMore  `bytes` is used up; the rest of the frame has yet to come
-//                   -> kBroken     not this protocol; problem() says why, and there is no way on
+//                   -> kNeedsMore  `bytes` is used up; the rest of the frame has not arrived yet
+//                   -> kBroken     not this protocol; problem() says why; final
 //
-// Every byte is looked at a bounded number of times, whatever the frame's length and however small the
-// pieces. What a header claims of lengths to come allocates nothing. One thread.
+// It reads each byte a bounded number of times, whatever the frame's length and however small the pieces. The
+// length that a header announces does not determine how much is allocated. One thread.
 class RpcFrameReader {
  public:
   enum class Result { kFrame, kNeedsMore, kBroken };
@@ -34,13 +34,13 @@ class RpcFrameReader {
   RpcFrameReader& operator=(const RpcFrameReader&) = delete;
   ~RpcFrameReader();
 
-  // Reads up to the end of one frame. Takes what it has used off the front of `bytes`, and it may take bytes
-  // of later frames, too: call it until it needs more.
+  // Reads up to the end of one frame. Removes the bytes that it has used from the front of `bytes`. It may
+  // also take bytes of later frames, so call it until it returns kNeedsMore.
   [[nodiscard]] Result next(std::string_view& bytes);
 
-  // After kFrame, until next(). May be moved from.
+  // Valid after kFrame until the next call of next(). May be moved from.
   RpcFrame& frame();
-  // After kBroken.
+  // Valid after kBroken.
   const std::string& problem() const;
 
  private:

@@ -12,20 +12,21 @@
 namespace tonewerk {
 namespace {
 
-// Room made for what a header claims, at most: the rest is made as it comes.
+// Reserved at most for the count that a header announces. The rest is allocated as elements arrive.
 constexpr std::uint32_t kMaxReserved = 64;
-// A map among the arguments is mostly a message, to which its session adds some entries of its own.
+// A map among the arguments is usually a message, to which its session adds a few entries.
 constexpr std::size_t kMessageDepth = 3;
 constexpr std::uint32_t kRoomForAdditions = 3;
-// No method takes as many. More are refused, so that a frame of empty arguments does not become a vast list.
+// More than any method has. Further ones are refused, so that a frame of nil arguments does not become a huge
+// list.
 constexpr std::size_t kMaxArguments = 16;
 
-// Of a response's array.
+// Indexes in a response's array.
 constexpr std::size_t kErrorPlace = 2;
 constexpr std::size_t kResultPlace = 3;
 
-// Places in the frame's array: the kind, then (but in notifications) the identifier, then the method or the
-// error.
+// Indexes in the frame's array: first the kind, then the identifier (not in notifications), then the method
+// or the error.
 constexpr std::size_t identifierPlace(RpcFrame::Kind kind) {
   return kind == RpcFrame::Kind::kNotification ? std::numeric_limits<std::size_t>::max() : 1;
 }
@@ -141,7 +142,7 @@ bool RpcFrameVisitor::start_map_value() {
 bool RpcFrameVisitor::end_array() {
   if (depth_ == 1) {
     depth_ = 0;
-    return true;  // the parser ends here, too
+    return true;  // the frame is complete, and the parser stops here
   }
   if (isInArguments()) {
     isReadingArguments_ = false;
@@ -213,7 +214,8 @@ bool RpcFrameVisitor::put(Value value) {
   return true;
 }
 
-// Mostly without a look at the keys that are there already: they are shared, and other threads count on them.
+// Usually does not compare with the earlier keys: other threads change their reference counts, so reading
+// them is slow.
 void RpcFrameVisitor::putInMap(Container& container, Value value) {
   const std::uint64_t bit = std::uint64_t{1} << (container.key.hash() & 63U);
   if ((container.keyBits & bit) == 0) {
@@ -264,8 +266,8 @@ bool RpcFrameVisitor::setMethod(std::string_view text) {
   return true;
 }
 
-// A daemon's answer may hold what no client said, such as the name of a process; nobody is to lose a
-// connection over a noncharacter in it.
+// A daemon's answer may hold text that is not from a client, such as the name of a process. A noncharacter in
+// it must not end the connection.
 std::optional<SharedString> RpcFrameVisitor::sharedText(StringInterner& cache, std::string_view text) const {
   std::optional<SharedString> shared = cache.find(text);
   if (!shared && frame_.kind == RpcFrame::Kind::kResponse && isUtf8(text)) shared.emplace(text);
@@ -281,7 +283,7 @@ bool RpcFrameVisitor::putKey(std::string_view text) {
 
 bool RpcFrameVisitor::refuse(const char* what) {
   if (!frame_.refused) frame_.refused = RefusedValue{frame_.arguments.size(), what};
-  // A stand-in, so that what follows falls into the right places.
+  // Adds a placeholder, so that the arguments after it keep their index.
   if (isInArguments() && frame_.arguments.size() < kMaxArguments) frame_.arguments.emplace_back(Value());
   return true;
 }

@@ -16,21 +16,21 @@
 
 namespace tonewerk {
 
-// Builds one frame out of the events of a MessagePack parser: straight into the frame's arguments, without a
-// tree in between. The functions with underscores are named by the parser, which calls them; they return
-// false to stop it.
+// Builds one frame from the events of a MessagePack parser, directly into the frame's arguments and without a
+// tree of objects. The parser requires the functions with underscores in their names; they return false to
+// stop it.
 class RpcFrameVisitor {
  public:
   explicit RpcFrameVisitor(RpcStrings& texts) : texts_(texts) {}
 
   RpcFrame& frame() { return frame_; }
   const std::string& problem() const { return problem_; }
-  // The frame cannot be one. Always false.
+  // Notes that the bytes are not a frame. Always returns false.
   bool broken(std::string problem);
 
-  // Before every frame.
+  // Call it before every frame.
   void init();
-  // Before a value by itself, which goes where it would in a frame.
+  // Call it before a single value, which is then read as if it were at `place` in a frame.
   void initAt(ValuePlace place);
 
   [[nodiscard]] bool visit_nil();
@@ -63,11 +63,12 @@ class RpcFrameVisitor {
     bool awaitsKey = false;
     SharedString key;
     ValueMap map;
-    std::uint64_t keyBits = 0;  // one bit of each key's hash; a key without its bit here is new
+    std::uint64_t keyBits = 0;  // one bit per key's hash; a key whose bit is not set is new
     std::vector<Value> values;
   };
 
-  // The frame's own array is depth 1, the arguments' is depth 2; what they hold goes into the frame itself.
+  // The frame's own array has depth 1, that of the arguments depth 2. Their elements go directly into the
+  // frame.
   bool isInFrame() const { return depth_ == 1; }
   bool isInArguments() const { return depth_ == 2 && isReadingArguments_; }
   bool isKeyAwaited() const { return depth_ > 1 && !isInArguments() && containers_[depth_ - 1].awaitsKey; }
@@ -83,7 +84,8 @@ class RpcFrameVisitor {
   static void putInMap(Container& container, Value value);
   [[nodiscard]] bool putKey(std::string_view text);
   [[nodiscard]] std::optional<SharedString> sharedText(StringInterner& cache, std::string_view text) const;
-  // Notes the first value that the protocol does not carry and goes on with a stand-in for it.
+  // Notes the first value that the protocol does not allow, and puts a placeholder in its place. Always
+  // returns true.
   bool refuse(const char* what);
 
   RpcStrings& texts_;
@@ -91,7 +93,7 @@ class RpcFrameVisitor {
   std::string problem_;
   std::size_t depth_ = 0;
   std::size_t frameSize_ = 0;   // elements of the frame's array
-  std::size_t framePlace_ = 0;  // the element that comes next
+  std::size_t framePlace_ = 0;  // index of the next element
   bool isReadingArguments_ = false;
   std::array<Container, kMaxFrameDepth> containers_;
 };

@@ -5,14 +5,14 @@
 
 namespace tonewerk {
 
-// A frame may be this long and no longer.
+// The longest frame.
 inline constexpr std::size_t kMaxFrameBytes = std::size_t{1024} * 1024;
 
-// Arrays and maps inside each other; the frame's own array is the first.
+// Arrays and maps nested inside each other. The frame's own array is the first.
 inline constexpr std::size_t kMaxFrameDepth = 32;
 
-// What a connection may have under way before it is no longer read from: requests whose bodies have not run,
-// and bytes of those together with the bytes of replies that the peer has not read.
+// When a connection reaches one of these, nothing more is read from it: the number of requests whose bodies
+// have not run yet, and the bytes of these requests and of the replies that the peer has not read.
 inline constexpr std::size_t kMaxUnfinishedRequests = 1024;
 inline constexpr std::size_t kMaxUnfinishedBytes = std::size_t{4} * 1024 * 1024;
 

@@ -13,14 +13,14 @@
 
 namespace tonewerk {
 
-// Output that grows a string.
+// Output that appends to a string.
 struct StringOutput {
   std::string& text;
   void write(const char* data, std::size_t size) { text.append(data, size); }
 };
 
-// MessagePack as this protocol has it. `Output` has write(const char* data, std::size_t size). Allocates
-// nothing itself.
+// Writes MessagePack in this protocol's form. `Output` has write(const char* data, std::size_t size).
+// Allocates nothing itself.
 template <class Output>
 class RpcPacker : public msgpack::packer<Output> {
  public:
@@ -33,8 +33,8 @@ class RpcPacker : public msgpack::packer<Output> {
     this->pack_str_body(text.data(), size);
   }
 
-  // By hand: the library's own would make an integer of a double without a fraction, and the reader of 2.0
-  // would get something else than was sent.
+  // Writes the bytes itself, because the library writes a double without a fraction as an integer, so that
+  // 2.0 would arrive as 2.
   void number(double number) {
     const auto bits = std::bit_cast<std::uint64_t>(number);
     std::array<char, 1 + sizeof(bits)> bytes{'\xCB'};
@@ -44,11 +44,11 @@ class RpcPacker : public msgpack::packer<Output> {
     output_.write(bytes.data(), bytes.size());
   }
 
-  // MessagePack that is already there.
+  // Copies bytes that are already MessagePack.
   void raw(const char* data, std::size_t size) { output_.write(data, size); }
 
   void date(Date date) {
-    const std::string body = timestampOf(date);  // of 12 bytes at most, for which no string allocates
+    const std::string body = timestampOf(date);  // at most 12 bytes, for which std::string does not allocate
     this->pack_ext(body.size(), static_cast<std::int8_t>(kTimestampExtension));
     this->pack_ext_body(body.data(), static_cast<std::uint32_t>(body.size()));
   }

@@ -8,11 +8,11 @@
 
 namespace tonewerk {
 
-// Where in a frame a value has its place. A result may nest one deeper than an argument, and its texts may
-// hold noncharacters.
+// Where a value stands in a frame. A result may be nested one level deeper than an argument, and its texts
+// may contain noncharacters.
 enum class ValuePlace { kArgument, kResult };
 
-// The one value that `bytes` are. None for nil, and for everything that no frame could carry in that place.
+// Reads `bytes` as exactly one value. None for nil and for anything that a frame may not hold at that place.
 [[nodiscard]] std::optional<Value> readValue(std::string_view bytes, ValuePlace place);
 
 }  // namespace tonewerk

@@ -18,25 +18,26 @@ class RpcWriter {
   // `out` outlives the writer.
   explicit RpcWriter(std::string& out) : out_(out) {}
 
-  // What a request and a notification (without an identifier) begin with, and what follows in both.
+  // head() writes the start of a request, or of a notification when there is no identifier; body() writes the
+  // rest of either.
   static constexpr std::size_t kMaxHeadBytes = 7;
   void head(std::optional<std::uint32_t> identifier);
   void body(std::string_view method, const Arguments& arguments);
 
   void request(std::uint32_t identifier, std::string_view method, const Arguments& arguments);
   void notification(std::string_view method, const Arguments& arguments);
-  // `error` and `result` none are nil.
+  // No `error` and no `result` are each written as nil.
   void response(std::uint32_t identifier, const std::optional<ReplyError>& error,
                 const std::optional<Value>& result);
 
-  // A value by itself.
+  // Writes a single value, without a frame.
   void value(const Value& value);
 
  private:
   std::string& out_;
 };
 
-// Whether a frame with these arguments is nested no deeper than a frame may be.
+// True when a frame with these arguments is not nested deeper than kMaxFrameDepth.
 [[nodiscard]] bool fitsFrameDepth(const Arguments& arguments);
 
 }  // namespace tonewerk

@@ -6,7 +6,7 @@
 namespace tonewerk {
 
 std::optional<SharedString> StringInterner::find(std::string_view text) {
-  if (text.size() > mostBytes_) return isText(text) ? std::optional<SharedString>(text) : std::nullopt;
+  if (text.size() > maxBytes_) return isText(text) ? std::optional<SharedString>(text) : std::nullopt;
   std::size_t& guess = slots_[last_].next;
   last_ = guess;
   if (slots_[guess].text == text) return slots_[guess].text;

@@ -10,28 +10,29 @@
 
 namespace tonewerk {
 
-// Texts that were seen lately, so that one that comes again costs neither an allocation nor another UTF-8
-// check. A client's messages repeat the same few dozen keys for as long as it lives.
+// Caches recent texts, so that a repeated text needs neither an allocation nor another UTF-8 check. A
+// client's messages repeat the same few dozen keys during its whole life.
 //
-// Each text has one place, by its hash; a newer one takes it over. Memory is so bounded by slots * mostBytes,
-// and a client that sends ever new texts only makes the cache useless. One thread.
+// Each text belongs to one slot, chosen by its hash, and a newer text replaces an older one there. That
+// limits memory to slots * maxBytes. A client that always sends new texts makes the cache useless but no
+// larger. One thread.
 class StringInterner {
  public:
-  // `slots` a power of two. Texts longer than `mostBytes` are never kept.
-  StringInterner(std::size_t slots, std::size_t mostBytes) : slots_(slots), mostBytes_(mostBytes) {}
+  // `slots` is a power of two. Texts longer than `maxBytes` are never cached.
+  StringInterner(std::size_t slots, std::size_t maxBytes) : slots_(slots), maxBytes_(maxBytes) {}
 
-  // The text, shared with its earlier users where possible. None when isText() says that it is none.
+  // The text, shared with its earlier users where possible. None when isText() refuses it.
   [[nodiscard]] std::optional<SharedString> find(std::string_view text);
 
  private:
   struct Slot {
     SharedString text;
-    std::size_t next = 0;
+    std::size_t next = 0;  // the slot of the text that followed this one last time
   };
 
   std::vector<Slot> slots_;
-  std::size_t mostBytes_;
-  std::size_t last_ = 0;  // the place of the text that was asked for last
+  std::size_t maxBytes_;
+  std::size_t last_ = 0;  // the slot of the text that was found last
 };
 
 }  // namespace tonewerk

@@ -13,7 +13,7 @@
 namespace tonewerk {
 namespace {
 
-// Memory that is the process's own: without files and what is shared with others.
+// The process's own memory in RAM, without files and memory shared with other processes.
 std::size_t residentBytes() {
   std::ifstream statm("/proc/self/statm");
   std::size_t size = 0;
@@ -23,9 +23,9 @@ std::size_t residentBytes() {
   return (resident - std::min(shared, resident)) * static_cast<std::size_t>(::sysconf(_SC_PAGESIZE));
 }
 
-std::size_t bytesKeptIdle() {
+std::size_t idleBytesOfTheProcess() {
   const std::size_t resident = residentBytes();
-  if (resident <= AllocatorReclaimer::kSpareBytes) return 0;  // no need to ask the allocator
+  if (resident <= AllocatorReclaimer::kSpareBytes) return 0;  // cannot be above kSpareBytes
   const struct mallinfo2 all = ::mallinfo2();
   const std::size_t used = all.uordblks + all.hblkhd;
   return resident - std::min(used, resident);
@@ -36,61 +36,62 @@ bool isPowerOfTwo(int number) { return (number & (number - 1)) == 0; }
 }  // namespace
 
 Allocator Allocator::ofTheProcess() {
-  return {bytesKeptIdle, [] { ::malloc_trim(0); }};
+  return {idleBytesOfTheProcess, [] { ::malloc_trim(0); }};
 }
 
-struct AllocatorReclaimer::Looks {
+struct AllocatorReclaimer::Checks {
   TimerService& timers;
   const Allocator allocator;
-  std::atomic<bool> isAskedFor = false;
+  std::atomic<bool> isRequested = false;
   Mutex mutex;
   std::unique_ptr<Timer> timer GUARDED_BY(mutex);
-  int seconds GUARDED_BY(mutex) = 0;  // since the looks began
+  int seconds GUARDED_BY(mutex) = 0;  // since the series of checks began
 
-  Looks(TimerService& service, Allocator looked) : timers(service), allocator(std::move(looked)) {}
+  Checks(TimerService& service, Allocator processAllocator)
+      : timers(service), allocator(std::move(processAllocator)) {}
 
-  void begin(const std::weak_ptr<Looks>& self) {
+  void begin(const std::weak_ptr<Checks>& self) {
     const MutexLock lock(mutex);
     if (timer != nullptr) return;
-    timer = timers.repeat(kFirstLook, [self] {
-      if (const auto looks = self.lock()) looks->tick();
+    timer = timers.repeat(kFirstCheck, [self] {
+      if (const auto checks = self.lock()) checks->tick();
     });
   }
 
   void tick() {
-    if (isLookDue() && allocator.idleBytes() > kSpareBytes) allocator.giveBack();
+    if (isCheckDue() && allocator.idleBytes() > kSpareBytes) allocator.giveBack();
   }
 
-  bool isLookDue() {
+  bool isCheckDue() {
     const MutexLock lock(mutex);
-    // Asked for again from now on means looks after those that are under way.
-    if (seconds == 0) isAskedFor = false;
+    // A request from now on makes another series of checks follow this one.
+    if (seconds == 0) isRequested = false;
     const bool isDue = isPowerOfTwo(++seconds);
     if (seconds < kLastLook) return isDue;
     seconds = 0;
-    if (!isAskedFor) timer = nullptr;
+    if (!isRequested) timer = nullptr;
     return isDue;
   }
 };
 
 AllocatorReclaimer::AllocatorReclaimer(TimerService& timers, Allocator allocator)
-    : looks_(std::make_shared<Looks>(timers, std::move(allocator))) {}
+    : checks_(std::make_shared<Checks>(timers, std::move(allocator))) {}
 
 AllocatorReclaimer::~AllocatorReclaimer() {
-  const MutexLock lock(looks_->mutex);
-  looks_->timer = nullptr;
+  const MutexLock lock(checks_->mutex);
+  checks_->timer = nullptr;
 }
 
-// Who brought it does not matter: many small clients leave as much behind as a large one, and what one of
-// them brought may be held by another's session.
-void AllocatorReclaimer::clientBrought(std::size_t bytes) {
-  if (broughtBytes_.fetch_add(bytes, std::memory_order_relaxed) + bytes >= kMuchBytes) lookSoon();
+// Counts all clients together: many small clients leave as much memory behind as a large one, and the session
+// of one client may hold what another has sent.
+void AllocatorReclaimer::clientSent(std::size_t bytes) {
+  if (sentBytes_.fetch_add(bytes, std::memory_order_relaxed) + bytes >= kSentBytesThreshold) scheduleChecks();
 }
 
-void AllocatorReclaimer::lookSoon() {
-  // Mostly it is asked for already, and reading costs least.
-  if (looks_->isAskedFor.load(std::memory_order_relaxed)) return;
-  if (!looks_->isAskedFor.exchange(true)) looks_->begin(looks_);
+void AllocatorReclaimer::scheduleChecks() {
+  // Usually checks are already requested, and a load is cheaper than an exchange.
+  if (checks_->isRequested.load(std::memory_order_relaxed)) return;
+  if (!checks_->isRequested.exchange(true)) checks_->begin(checks_);
 }
 
 }  // namespace tonewerk

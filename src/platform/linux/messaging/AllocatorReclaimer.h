@@ -12,51 +12,51 @@
 
 namespace tonewerk {
 
-// What the C library's allocator has of the system.
+// The C library's allocator, as far as the reclaimer uses it.
 struct Allocator {
-  // Memory that nobody uses, but that the allocator keeps for later. Costs a walk over what is free, and some
-  // ten microseconds while the process is small.
+  // Bytes that are free but that the allocator has not returned to the system. Walks over the free blocks;
+  // takes about ten microseconds while the process is small.
   std::function<std::size_t()> idleBytes;
-  // Gives it back. Who allocates meanwhile may wait for as long as that takes.
+  // Returns free memory to the system. Threads that allocate meanwhile may wait until it has finished.
   std::function<void()> giveBack;
 
   static Allocator ofTheProcess();
 };
 
-// Gives memory back to the system that the allocator would keep for good: what a large session held when it
-// has ended, what unfinished frames held when their connections have gone.
+// Returns memory to the system that the allocator would otherwise keep: that of a large session after its
+// end, and that of unfinished frames after the end of their connections.
 //
-// Nobody has to know when that is. Once clients have brought much, all of them together, whatever one of them
-// sends may be what ends a large session, and so may its end. So each of both asks for looks at the
-// allocator: 1, 2, 4 ... 32 seconds later, since the store and the files may still be writing what a session
-// had. After the last look nothing runs until somebody asks again.
+// It cannot see when a large session ends. Once all clients together have sent kSentBytesThreshold bytes,
+// every message and every end of a client may be the end of a large session, so each of them schedules checks
+// of the allocator: 1, 2, 4 ... 32 seconds later, because the store and the files may still be writing the
+// session's data. After the last check nothing runs until checks are scheduled again.
 class AllocatorReclaimer {
  public:
-  // What the allocator may keep: less is soon used again.
+  // The allocator may keep this many free bytes, because it soon uses them again.
   static constexpr std::size_t kSpareBytes = std::size_t{16} << 20;
-  // What clients may bring in the daemon's life before anybody looks. A frame that never ends may hold forty
-  // times its bytes, so that this can leave little more than the allocator may keep.
-  static constexpr std::size_t kMuchBytes = std::size_t{512} << 10;
-  static constexpr std::chrono::seconds kFirstLook{1};
+  // Clients may send this many bytes in the daemon's life before the first check. An unfinished frame may
+  // hold forty times its bytes in memory, so that these can leave little more than kSpareBytes.
+  static constexpr std::size_t kSentBytesThreshold = std::size_t{512} << 10;
+  static constexpr std::chrono::seconds kFirstCheck{1};
   static constexpr int kLastLook = 32;
 
-  // `timers` outlives it; the looks are on their thread.
+  // `timers` outlives it. Checks run on the timers' thread.
   explicit AllocatorReclaimer(TimerService& timers, Allocator allocator = Allocator::ofTheProcess());
   AllocatorReclaimer(const AllocatorReclaimer&) = delete;
   AllocatorReclaimer& operator=(const AllocatorReclaimer&) = delete;
   ~AllocatorReclaimer();
 
-  // Any thread, all three. They cost next to nothing while looks are under way; when these are done, all of
-  // them follow once more.
-  void clientBrought(std::size_t bytes);
-  void clientWent() { clientBrought(0); }
-  void lookSoon();
+  // All three: any thread. While checks are scheduled they only set a flag; then the whole series follows
+  // once more.
+  void clientSent(std::size_t bytes);
+  void clientEnded() { clientSent(0); }
+  void scheduleChecks();
 
  private:
-  struct Looks;
+  struct Checks;
 
-  std::atomic<std::uint64_t> broughtBytes_ = 0;
-  const std::shared_ptr<Looks> looks_;  // a tick that is running may outlive us
+  std::atomic<std::uint64_t> sentBytes_ = 0;
+  const std::shared_ptr<Checks> checks_;  // a tick that is running may outlive us
 };
 
 }  // namespace tonewerk

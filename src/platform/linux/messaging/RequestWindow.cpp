@@ -7,7 +7,8 @@ namespace tonewerk {
 
 void RequestWindow::finished(std::size_t bytes) {
   finishedBytes_.fetch_add(bytes);
-  // In one total order with hasRoom(): either this sees what the I/O thread waits for, or that sees this.
+  // Both functions use sequentially consistent atomics: either this thread sees the count that hasRoom()
+  // waits for, or hasRoom() sees this request's end.
   if (finishedRequests_.fetch_add(1) + 1 == wakeAt_.load()) waker_->wake(connection_);
 }
 
@@ -29,7 +30,7 @@ bool RequestWindow::hasRoom(std::size_t otherBytes) {
     if (isBelowBound(otherBytes)) return true;
     const std::uint64_t unfinished = startedRequests_ - knownFinishedRequests_;
     if (unfinished == 0)
-      return false;  // the other bytes alone are too many; their way out is not watched here
+      return false;  // the other bytes alone reach the bound, and this class does not count those
     const std::uint64_t awaited = knownFinishedRequests_ + (unfinished + 1) / 2;
     wakeAt_.store(awaited);
     if (finishedRequests_.load() < awaited) return false;

@@ -12,10 +12,10 @@
 
 namespace tonewerk {
 
-// How many of a connection's requests are under way, and how many bytes they hold.
+// Counts a connection's unfinished requests and the bytes that they hold.
 //
-// The I/O thread counts what it starts, whoever finishes a request counts that; so the I/O thread only looks
-// at the others' counters when its own idea of them says that the bound is reached.
+// The I/O thread counts the requests that it starts, and the thread that finishes a request counts its end.
+// The I/O thread reads the second count only when the value that it read last says that the bound is reached.
 class RequestWindow final : public InFlightCounter, public std::enable_shared_from_this<RequestWindow> {
  public:
   RequestWindow(std::shared_ptr<IoWaker> waker, std::uint64_t connection)
@@ -24,12 +24,12 @@ class RequestWindow final : public InFlightCounter, public std::enable_shared_fr
   // Any thread.
   void finished(std::size_t bytes) override;
 
-  // The I/O thread: a request begins, and has ended when the token is gone.
+  // The I/O thread. A request begins; it ends when the token is destroyed.
   [[nodiscard]] InFlightToken start(std::size_t bytes);
 
-  // The I/O thread: whether there is room for another request beside `otherBytes` that the connection holds.
-  // When there is none, the connection is woken once half of the requests under way have finished: not for
-  // each, so that an overloaded daemon does not also switch threads for every request.
+  // The I/O thread. True when there is room for another request beside `otherBytes` that the connection
+  // holds. When there is none, the connection is woken once half of its unfinished requests have finished. It
+  // is not woken for each, so that an overloaded daemon does not switch threads for every request.
   [[nodiscard]] bool hasRoom(std::size_t otherBytes);
 
  private:
@@ -40,7 +40,7 @@ class RequestWindow final : public InFlightCounter, public std::enable_shared_fr
   const std::shared_ptr<IoWaker> waker_;
   const std::uint64_t connection_;
 
-  // The I/O thread's.
+  // Used by the I/O thread only.
   std::uint64_t startedRequests_ = 0;
   std::uint64_t startedBytes_ = 0;
   std::uint64_t knownFinishedRequests_ = 0;

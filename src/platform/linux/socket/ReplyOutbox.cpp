@@ -10,9 +10,10 @@
 namespace tonewerk {
 namespace {
 
-// A buffer that has grown past this is not kept.
+// A larger buffer is freed once it is empty.
 constexpr std::size_t kMaxKeptBytes = std::size_t{64} * 1024;
-// With so much unsent the connection may have stopped reading requests, and wants to know that it is gone.
+// With this much unsent the connection may have stopped reading requests, so it is woken when the bytes have
+// been sent.
 constexpr std::size_t kNotableBytes = std::size_t{64} * 1024;
 
 }  // namespace
@@ -24,8 +25,9 @@ void ReplyOutbox::reply(std::uint32_t requestIdentifier, const std::optional<Rep
     if (isClosed_ || state_ == State::kRefused) return;
     RpcWriter(unsent_).response(requestIdentifier, error, result);
     unsentBytes_ = unsent_.size() - sent_;
-    if (isPutOff_ || state_ == State::kFull) return;  // somebody is about to send, or waits to
-    isPutOff_ = true;
+    if (isSendDeferred_ || state_ == State::kFull)
+      return;  // sending is already deferred, or waits for the socket
+    isSendDeferred_ = true;
   }
   if (!BatchScope::defer(shared_from_this())) endOfBatch();
 }
@@ -34,7 +36,7 @@ void ReplyOutbox::endOfBatch() {
   bool mustWake = false;
   {
     const MutexLock lock(mutex_);
-    isPutOff_ = false;
+    isSendDeferred_ = false;
     if (isClosed_ || state_ != State::kOpen) return;
     const std::size_t before = unsent_.size();
     sendUnsent();

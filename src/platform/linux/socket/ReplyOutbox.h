@@ -14,26 +14,26 @@
 
 namespace tonewerk {
 
-// A connection's replies on their way out. Outlives its connection for as long as somebody can still reply;
-// replies then go nowhere.
+// Sends a connection's replies. Lives on after its connection as long as a reply may still come; such replies
+// are dropped.
 //
-//   reply() ... reply() -> unsent -> the socket     sent by whoever replied, at the end of its batch of work
-//                             |                     when the socket is full: by the I/O thread, when it is
-//                             not
-//                             +-> the I/O thread is woken when there is something for it to do
+//   reply() ... reply() -> unsent -> the socket     sent by the thread that replied, at the end of its batch;
+//                             |                     after a full socket: by the I/O thread, later
+//                             |
+//                             +-> the I/O thread is woken when it has something to do
 //
-// The thread that replies sends, too, because waking another to do it would cost more than the sending.
+// The thread that replies also sends, because waking another thread would cost more than sending.
 class ReplyOutbox final : public ReplySink,
                           public BatchScope::Deferred,
                           public std::enable_shared_from_this<ReplyOutbox> {
  public:
   enum class State {
     kOpen,
-    kFull,     // the socket takes no more for now; only the I/O thread tries again
-    kRefused,  // the peer takes nothing any more
+    kFull,     // the socket takes no more for now; only the I/O thread sends again
+    kRefused,  // the peer does not take any more bytes
   };
 
-  // `socket` is open until close(). The waker wakes the I/O thread for `connection`.
+  // `socket` stays open until close(). The waker wakes the I/O thread for `connection`.
   ReplyOutbox(int socket, std::shared_ptr<IoWaker> waker, std::uint64_t connection)
       : socket_(socket), waker_(std::move(waker)), connection_(connection) {}
 
@@ -42,11 +42,11 @@ class ReplyOutbox final : public ReplySink,
              const std::optional<Value>& result) override;
   void endOfBatch() override;
 
-  // The I/O thread: goes on with what the socket did not take.
+  // The I/O thread. Sends what the socket did not take before.
   [[nodiscard]] State flush();
   // Any thread.
   std::size_t unsentBytes() const { return unsentBytes_.load(std::memory_order_relaxed); }
-  // The I/O thread: the socket is about to be closed. Sends what it still takes.
+  // The I/O thread, before it closes the socket. Sends as much as the socket still takes.
   void close();
 
  private:
@@ -58,10 +58,10 @@ class ReplyOutbox final : public ReplySink,
   std::atomic<std::size_t> unsentBytes_{0};
   Mutex mutex_;
   std::string unsent_ GUARDED_BY(mutex_);
-  std::size_t sent_ GUARDED_BY(mutex_) = 0;  // of unsent_
+  std::size_t sent_ GUARDED_BY(mutex_) = 0;  // bytes of unsent_
   State state_ GUARDED_BY(mutex_) = State::kOpen;
   bool isClosed_ GUARDED_BY(mutex_) = false;
-  bool isPutOff_ GUARDED_BY(mutex_) = false;  // the sending, to the end of a batch
+  bool isSendDeferred_ GUARDED_BY(mutex_) = false;  // to the end of a batch
 };
 
 }  // namespace tonewerk

@@ -33,13 +33,13 @@ std::string directoryOf(const std::string& path) {
   return directory.empty() ? "." : directory;
 }
 
-// What becomes of who finds the directory locked: flock()'s operations.
+// What to do when the directory is locked, as operations of flock().
 constexpr int kWait = LOCK_EX;
 constexpr int kDoNotWait = LOCK_EX | LOCK_NB;
 
-// Held while the socket's file is looked at and replaced or removed, so that of two daemons that start
-// together one sees the other. Nothing is held when the directory cannot be opened; what follows then fails
-// by itself.
+// Locks the socket's directory while the socket's file is examined and replaced or removed, so that of two
+// daemons that start together one sees the other. Holds no lock when the directory cannot be opened; binding
+// the socket fails then, too.
 class DirectoryLock {
  public:
   DirectoryLock(const std::string& path, int operation)
@@ -48,15 +48,15 @@ class DirectoryLock {
     do {
       result = directory_ ? ::flock(directory_.get(), operation) : 0;
     } while (result != 0 && errno == EINTR);
-    isOthers_ = result != 0 && errno == EWOULDBLOCK;
+    isHeldElsewhere_ = result != 0 && errno == EWOULDBLOCK;
   }
 
-  // Whether another process has the lock and was not waited for.
-  bool isOthers() const { return isOthers_; }
+  // True when another process has the lock, with kDoNotWait.
+  bool isHeldElsewhere() const { return isHeldElsewhere_; }
 
  private:
   FileDescriptor directory_;
-  bool isOthers_ = false;
+  bool isHeldElsewhere_ = false;
 };
 
 // "name (pid)" of the process behind the other end of a connected socket.
@@ -68,15 +68,15 @@ std::string peerOf(int descriptor) {
   return name + " (" + std::to_string(peer.pid) + ")";
 }
 
-// Who listens at `address`; none when nobody does.
+// The process that listens at `address`; none when no process does.
 std::optional<std::string> listenerAt(const sockaddr_un& address) {
   const FileDescriptor probe = newSocket();
   if (::connect(probe.get(), generic(address), sizeof(address)) == 0) return peerOf(probe.get());
-  // A listener too busy to take one more connection is still a listener.
+  // A listener whose backlog is full is still a listener.
   return errno == EAGAIN ? std::optional<std::string>("another process") : std::nullopt;
 }
 
-// Where a bound socket's file is; empty for one without.
+// The path of a bound socket's file; empty when it has none.
 std::string pathOf(int descriptor) {
   sockaddr_un address{};
   socklen_t size = sizeof(address);
@@ -85,8 +85,9 @@ std::string pathOf(int descriptor) {
   return {address.sun_path, ::strnlen(address.sun_path, length)};
 }
 
-// Makes way for a new socket at `path`. False when it cannot be done.
-bool clear(const std::string& path, const sockaddr_un& address, std::string& problem) {
+// Removes the file of a socket on which no process listens. False, with `problem`, when `path` is in use or
+// cannot be removed.
+bool removeUnusedSocket(const std::string& path, const sockaddr_un& address, std::string& problem) {
   struct stat there {};
   if (::lstat(path.c_str(), &there) != 0) return true;
   if (!S_ISSOCK(there.st_mode)) {
@@ -118,7 +119,7 @@ std::unique_ptr<ServerSocket> ServerSocket::fromSystemd() {
     auto socket = std::unique_ptr<ServerSocket>(new ServerSocket(FileDescriptor(descriptor)));
     socket->name_ = "the socket that systemd passed";
     socket->isSystemds_ = true;
-    socket->noteFile(pathOf(descriptor));
+    socket->recordFile(pathOf(descriptor));
     return socket;
   }
   return nullptr;
@@ -139,28 +140,28 @@ std::unique_ptr<ServerSocket> ServerSocket::bound(const std::string& path, int l
   }
 
   const DirectoryLock lock(path, lockOperation);
-  if (lock.isOthers()) {
+  if (lock.isHeldElsewhere()) {
     problem = directoryOf(path) + " is locked by another process";
     return nullptr;
   }
-  if (!clear(path, *address, problem)) return nullptr;
+  if (!removeUnusedSocket(path, *address, problem)) return nullptr;
   auto socket = std::unique_ptr<ServerSocket>(new ServerSocket(newSocket()));
   const int descriptor = socket->fileDescriptor();
-  // Nobody can connect before listen(), so the mode is right from the start.
+  // No client can connect before listen(), so the mode is right from the start.
   if (::bind(descriptor, generic(*address), sizeof(*address)) != 0 ||
       ::chmod(path.c_str(), kSocketMode) != 0 || ::listen(descriptor, SOMAXCONN) != 0) {
     problem = "cannot listen at " + path + ": " + textOfErrno(errno);
     return nullptr;
   }
   socket->name_ = path;
-  socket->noteFile(path);
+  socket->recordFile(path);
   return socket;
 }
 
-void ServerSocket::noteFile(const std::string& path) {
+void ServerSocket::recordFile(const std::string& path) {
   path_ = path;
   struct stat made {};
-  if (::lstat(path.c_str(), &made) != 0) return;  // gone already, so not in place
+  if (::lstat(path.c_str(), &made) != 0) return;  // already gone, so isInPlace() is false
   device_ = made.st_dev;
   inode_ = made.st_ino;
 }
@@ -171,7 +172,7 @@ bool ServerSocket::isInPlace() const {
   return ::lstat(path_.c_str(), &there) == 0 && there.st_dev == device_ && there.st_ino == inode_;
 }
 
-std::unique_ptr<ServerSocket> ServerSocket::madeAgain(std::string& problem) const {
+std::unique_ptr<ServerSocket> ServerSocket::recreate(std::string& problem) const {
   if (isSystemds_) {
     problem = path_ + " was made by systemd, which has to make it again: restart twreportingd.socket";
     return nullptr;
@@ -181,15 +182,16 @@ std::unique_ptr<ServerSocket> ServerSocket::madeAgain(std::string& problem) cons
     problem = path_ + " went with its directory, and comes back with it";
     return nullptr;
   }
-  // Everybody who may read the directory may lock it for as long as they like, and clients wait meanwhile.
+  // Does not wait: any process that may read the directory may lock it for any length of time, and clients
+  // would wait meanwhile.
   return bound(path_, kDoNotWait, problem);
 }
 
 ServerSocket::~ServerSocket() {
   if (path_.empty() || isSystemds_ || !isInPlace()) return;
-  // What stays because somebody else has the lock is replaced by the next daemon.
+  // When another process has the lock the file stays, and the next daemon replaces it.
   const DirectoryLock lock(path_, kDoNotWait);
-  if (!lock.isOthers() && isInPlace()) ::unlink(path_.c_str());
+  if (!lock.isHeldElsewhere() && isInPlace()) ::unlink(path_.c_str());
 }
 
 }  // namespace tonewerk

@@ -14,7 +14,7 @@
 namespace tonewerk {
 namespace {
 
-// Of a method that nobody knows, in the answer that says so.
+// How much of an unknown method's name is repeated in the answer.
 constexpr std::size_t kMaxMethodNameBytes = 64;
 
 std::string problemText(const Method& method, const RefusedValue& refused) {
@@ -25,7 +25,8 @@ std::string problemText(const Method& method, const RefusedValue& refused) {
   return text + " " + refused.what;
 }
 
-// What a request holds while it is under way: its bytes, or what they have become where that is more.
+// The bytes that a request holds until it has finished: its frame's size or the size of its values, whichever
+// is larger.
 std::size_t bytesHeldBy(const RpcFrame& frame) {
   std::size_t bytes = frame.arguments.capacity() * sizeof(Argument);
   for (const Argument& argument : frame.arguments) {
@@ -42,7 +43,7 @@ UnixConnection::UnixConnection(const UnixConnectionContext& context, std::uint64
       identifier_(identifier),
       socket_(std::move(socket)),
       reader_(context.texts),
-      load_(std::make_shared<RequestWindow>(context.waker, identifier)),
+      window_(std::make_shared<RequestWindow>(context.waker, identifier)),
       outbox_(std::make_shared<ReplyOutbox>(socket_.get(), context.waker, identifier)) {
   ucred peer{};
   socklen_t size = sizeof(peer);
@@ -54,7 +55,7 @@ UnixConnection::UnixConnection(const UnixConnectionContext& context, std::uint64
 
 UnixConnection::~UnixConnection() {
   outbox_->close();
-  if (context_.memory != nullptr) context_.memory->clientWent();
+  if (context_.memory != nullptr) context_.memory->clientEnded();
 }
 
 std::string UnixConnection::description() const {
@@ -83,7 +84,7 @@ void UnixConnection::handleEvents(std::uint32_t events) {
 void UnixConnection::handleWake() {
   if (hasEnded_) return;
   replies_ = outbox_->flush();
-  if (isPaused_ && hasRoom()) process(std::exchange(rest_, {}));
+  if (isPaused_ && hasRoom()) process(std::exchange(unprocessed_, {}));
   updateInterest();
 }
 
@@ -92,7 +93,7 @@ void UnixConnection::receive() {
       ::recv(socket_.get(), context_.readBuffer.data(), context_.readBuffer.size(), MSG_DONTWAIT);
   if (count > 0) {
     const auto bytes = static_cast<std::size_t>(count);
-    if (context_.memory != nullptr) context_.memory->clientBrought(bytes);
+    if (context_.memory != nullptr) context_.memory->clientSent(bytes);
     return process({context_.readBuffer.data(), bytes});
   }
   if (count == 0) return end();
@@ -122,7 +123,7 @@ void UnixConnection::process(std::string_view bytes) {
     if (hasEnded_) return;
   }
   isPaused_ = true;
-  rest_ = bytes;
+  unprocessed_ = bytes;
 }
 
 void UnixConnection::dispatch(RpcFrame& frame) {
@@ -130,7 +131,7 @@ void UnixConnection::dispatch(RpcFrame& frame) {
   const std::optional<std::size_t> method = interface_->find(frame.method);
   Reply reply = frame.kind == RpcFrame::Kind::kRequest ? Reply(outbox_, frame.identifier) : Reply();
   if (const auto problem = problemWithFrame(frame, method)) return reply(problem);
-  InFlightToken token = load_->start(bytesHeldBy(frame) + interface_->methods[*method].replyBytes);
+  InFlightToken token = window_->start(bytesHeldBy(frame) + interface_->methods[*method].replyBytes);
   object_->handleRequest(*method, std::move(frame.arguments), std::move(reply), std::move(token));
 }
 
@@ -155,12 +156,13 @@ void UnixConnection::updateInterest() {
   if (hasEnded_ || !isResumed_) return;
   std::uint32_t wanted = 0;
   if (!isPaused_) wanted |= EPOLLIN;
-  // A peer that stopped reading may never send again, either. Being ready to write, which the socket then
-  // always is, brings the round in which it is read empty.
+  // A peer that stopped reading may never send again, and then no event would come. Its socket is always
+  // writable, so EPOLLOUT makes sure that what it has sent is read.
   const bool isRefused = replies_ == ReplyOutbox::State::kRefused;
   if (replies_ == ReplyOutbox::State::kFull || (isRefused && !isPaused_)) wanted |= EPOLLOUT;
   if (wanted == interest_) return;
-  // Without anything wanted the socket is taken out: a hang-up is reported whether it is wanted or not.
+  // Without any wanted event the socket is removed, because epoll reports a hang-up even when it is not
+  // wanted.
   if (wanted == 0) {
     context_.epoll.remove(socket_.get());
   } else {

@@ -30,17 +30,18 @@ struct UnixConnectionContext {
   RpcStrings& texts;
   std::span<char> readBuffer;
   const LogCategory& log;
-  std::uint32_t owner;         // who may use what is for the daemon's own user
-  AllocatorReclaimer* memory;  // told of what clients bring, and of their ends; may be null
+  std::uint32_t owner;  // this user and root may call the methods for the daemon's owner
+  // Learns how many bytes a client has sent, and when it is gone. May be null.
+  AllocatorReclaimer* memory;
 };
 
-// One client's socket, on the I/O thread.
+// Serves one client's socket, on the I/O thread.
 //
 //   socket -> readBuffer -> RpcFrameReader -> exported object      as long as there is room for requests
 //   socket <- ReplyOutbox <- replies of any thread
 //
-// A connection without room is paused: what was read and not used waits in rest_, and the socket is not
-// looked at.
+// A connection without room for requests is paused: bytes that were read and not used wait in unprocessed_,
+// and the socket is not read.
 class UnixConnection final : public MessagingConnection {
  public:
   // `context` outlives the connection. `identifier` is its number in the epoll and the waker.
@@ -55,24 +56,24 @@ class UnixConnection final : public MessagingConnection {
   void setInvalidationHandler(std::function<void()> handler) override { invalidated_ = std::move(handler); }
   void resume() override;
 
-  // The socket is ready for `events`.
+  // The epoll has reported `events` for the socket.
   void handleEvents(std::uint32_t events);
-  // Replies wait, or there is room again.
+  // Replies wait to be sent, or there is room for requests again.
   void handleWake();
-  // Ends the connection; its handlers have returned when this does. Once; later calls do nothing.
+  // Ends the connection. Its handlers have returned when this returns. Later calls do nothing.
   void end();
   bool hasEnded() const { return hasEnded_; }
 
  private:
   void receive();
-  // Takes frames off `bytes` until they or the room are used up.
+  // Reads frames from `bytes` until the bytes or the room for requests are used up.
   void process(std::string_view bytes);
   void dispatch(RpcFrame& frame);
   [[nodiscard]] std::optional<ReplyError> problemWithFrame(const RpcFrame& frame,
                                                            std::optional<std::size_t> method) const;
   void endAsBroken(std::string_view problem);
   void updateInterest();
-  bool hasRoom() { return load_->hasRoom(outbox_->unsentBytes()); }
+  bool hasRoom() { return window_->hasRoom(outbox_->unsentBytes()); }
 
   const UnixConnectionContext& context_;
   const std::uint64_t identifier_;
@@ -88,14 +89,15 @@ class UnixConnection final : public MessagingConnection {
   bool hasEnded_ = false;
 
   RpcFrameReader reader_;
-  std::shared_ptr<RequestWindow> load_;
+  std::shared_ptr<RequestWindow> window_;
   bool isPaused_ = false;
-  std::string rest_;
+  std::string unprocessed_;
 
   std::shared_ptr<ReplyOutbox> outbox_;
-  // As last seen. Of a peer that refuses replies everything received is read, and then the connection ends.
+  // The outbox's state when it was last read. When the peer refuses replies, everything that it has sent is
+  // read, and then the connection ends.
   ReplyOutbox::State replies_ = ReplyOutbox::State::kOpen;
-  std::uint32_t interest_ = 0;  // what the epoll has been told
+  std::uint32_t interest_ = 0;  // the events that the epoll waits for; 0 while it does not watch the socket
 };
 
 }  // namespace tonewerk

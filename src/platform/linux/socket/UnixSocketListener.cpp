@@ -17,7 +17,7 @@
 namespace tonewerk {
 namespace {
 
-// Connections accepted in one round, before those that are there have their turn.
+// The most connections accepted in one round, so that existing connections are served in between.
 constexpr int kMaxAcceptsAtOnce = 16;
 
 std::size_t descriptorsForClients() {
@@ -37,7 +37,7 @@ UnixSocketListener::UnixSocketListener(std::unique_ptr<ServerSocket> socket, con
       readBuffer_(kReadBytes),
       context_{epoll_, waker_, texts_, readBuffer_, log_, owner, memory},
       watchdog_(std::move(watchdog)),
-      mostConnections_(descriptorsForClients()) {}
+      maxConnections_(descriptorsForClients()) {}
 
 UnixSocketListener::~UnixSocketListener() { shutDown(); }
 
@@ -59,7 +59,7 @@ void UnixSocketListener::shutDown() {
 
 void UnixSocketListener::run() {
   ::pthread_setname_np(::pthread_self(), "tw-messaging");
-  // Without its waker the thread would never learn that it is to stop.
+  // Without the waker the thread would never notice that it has to stop.
   if (!epoll_.add(waker_->fileDescriptor(), kWaker, EPOLLIN | EPOLLET)) {
     errorLog(log_, "cannot be woken: %@", std::generic_category().message(errno));
   }
@@ -71,13 +71,13 @@ void UnixSocketListener::run() {
     if (acceptAgainAt_ && std::chrono::steady_clock::now() >= *acceptAgainAt_) resumeAccepting();
     if (watchdog_ != nullptr) watchdog_->pingIfDue();
   }
-  endEverything();
+  endAll();
 }
 
 void UnixSocketListener::handle(const Epoll::Event& event) {
   if (event.identifier == kSocket) return accept();
   if (event.identifier == kWaker) return handleWakes();
-  // A connection that ended earlier in this round is not found any more.
+  // A connection that ended earlier in this round is no longer in the map.
   const auto found = connections_.find(event.identifier);
   if (found == connections_.end()) return;
   found->second->handleEvents(event.events);
@@ -91,7 +91,7 @@ void UnixSocketListener::handleWakes() {
     found->second->handleWake();
     removeIfEnded(identifier);
   }
-  if (mustRestore_.exchange(false)) makeSocketAgain();
+  if (mustRestore_.exchange(false)) recreateSocket();
 }
 
 void UnixSocketListener::restoreSocket() {
@@ -99,15 +99,15 @@ void UnixSocketListener::restoreSocket() {
   waker_->wake(kWaker);
 }
 
-void UnixSocketListener::makeSocketAgain() {
+void UnixSocketListener::recreateSocket() {
   if (socket_->isInPlace()) return;
   std::string problem;
-  std::unique_ptr<ServerSocket> socket = socket_->madeAgain(problem);
+  std::unique_ptr<ServerSocket> socket = socket_->recreate(problem);
   if (socket == nullptr) {
     errorLog(log_, "clients cannot connect: %@", problem);
     return;
   }
-  if (!acceptAgainAt_) accept();  // who found the old one
+  if (!acceptAgainAt_) accept();  // clients that connected to the old socket
   const bool isPaused = acceptAgainAt_.has_value();
   if (!isPaused) epoll_.remove(socket_->fileDescriptor());
   socket_ = std::move(socket);
@@ -117,7 +117,7 @@ void UnixSocketListener::makeSocketAgain() {
 
 void UnixSocketListener::accept() {
   for (int count = 0; count < kMaxAcceptsAtOnce; ++count) {
-    if (connections_.size() >= mostConnections_) return pauseAccepting("too many clients");
+    if (connections_.size() >= maxConnections_) return pauseAccepting("too many clients");
     FileDescriptor socket(
         ::accept4(socket_->fileDescriptor(), nullptr, nullptr, SOCK_CLOEXEC | SOCK_NONBLOCK));
     if (socket) {
@@ -125,10 +125,10 @@ void UnixSocketListener::accept() {
       continue;
     }
     if (errno == EAGAIN) {
-      hasLoggedPause_ = false;  // nobody waits any more; the next shortage is another one
+      hasLoggedPause_ = false;  // no client waits any more, so the next shortage is logged again
       return;
     }
-    // A client that gave up before its turn is no reason to stop; anything else would come again at once.
+    // A client that disconnected before its turn does not matter. Any other error would repeat at once.
     if (errno != EINTR && errno != ECONNABORTED)
       return pauseAccepting(std::generic_category().message(errno));
   }
@@ -182,7 +182,7 @@ void UnixSocketListener::removeIfEnded(std::uint64_t identifier) {
   if (acceptAgainAt_) resumeAccepting();
 }
 
-void UnixSocketListener::endEverything() {
+void UnixSocketListener::endAll() {
   socket_ = nullptr;
   for (const auto& [identifier, connection] : connections_) connection->end();
   connections_.clear();

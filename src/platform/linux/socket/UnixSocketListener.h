@@ -25,20 +25,20 @@ namespace tonewerk {
 
 // Serves clients over a Unix socket, all of them on one thread of its own, the messaging thread.
 //
-// Every round gives each connection that is ready one read, so that no client can keep the others waiting.
-// Clients take only so many descriptors that kReservedDescriptors are left for the daemon's own files; who
-// comes then waits in the socket's backlog.
+// In every round each connection that is ready is read once, so that no client can keep the others waiting.
+// At least kReservedDescriptors (or half of all, if that is less) are left for the daemon's own files.
+// Further clients wait in the socket's backlog.
 class UnixSocketListener final : public MessagingListener {
  public:
   static constexpr std::size_t kReadBytes = std::size_t{64} * 1024;
   static constexpr std::size_t kReservedDescriptors = 64;
-  // When the system has no descriptor for another client, the next try is after this time or a connection's
-  // end.
+  // When the system has no descriptor for another client, the listener tries again after this time or when a
+  // connection has ended.
   static constexpr std::chrono::milliseconds kAcceptPause{1000};
 
-  // `log` outlives the listener. The messaging thread feeds `watchdog`; without one it wakes up for clients
-  // alone. `owner` is the user who, beside root, may use what is for the daemon's own. `memory`, which
-  // outlives the listener, is told of what clients bring, and of their ends.
+  // `log` and `memory` outlive the listener. The messaging thread feeds `watchdog`; without one it wakes up
+  // only for clients. `owner` and root may call the methods that are for the daemon's own user. `memory`
+  // learns how many bytes clients send and when a client is gone. It may be null.
   UnixSocketListener(std::unique_ptr<ServerSocket> socket, const LogCategory& log,
                      std::unique_ptr<WatchdogFeeder> watchdog = nullptr, std::uint32_t owner = ::geteuid(),
                      AllocatorReclaimer* memory = nullptr);
@@ -48,12 +48,12 @@ class UnixSocketListener final : public MessagingListener {
   void resume() override;
   void shutDown() override;
 
-  // Any thread. Where the socket's file is gone, a new one is soon made in its place; connections live on.
-  // What stands in the way is logged.
+  // Any thread. Makes the messaging thread recreate the socket if its file is gone. Connections continue. A
+  // failure is logged.
   void restoreSocket();
 
  private:
-  // Numbers in the epoll; connections have those above.
+  // Identifiers in the epoll. Connections have higher ones.
   static constexpr std::uint64_t kSocket = 0;
   static constexpr std::uint64_t kWaker = 1;
 
@@ -61,29 +61,29 @@ class UnixSocketListener final : public MessagingListener {
   void handle(const Epoll::Event& event);
   void handleWakes();
   void accept();
-  void makeSocketAgain();
+  void recreateSocket();
   void add(FileDescriptor socket);
   void pauseAccepting(const std::string& why);
   void resumeAccepting();
-  // Puts the listening socket into the epoll. Pauses accepting, and so tries again later, when that fails.
+  // Adds the listening socket to the epoll. If that fails it pauses accepting, and so tries again later.
   void watchSocket();
   std::optional<std::chrono::milliseconds> timeToNextAccept() const;
   std::optional<std::chrono::milliseconds> timeToNextRound() const;
   void removeIfEnded(std::uint64_t identifier);
-  void endEverything();
+  void endAll();
 
   std::unique_ptr<ServerSocket> socket_;
   const LogCategory& log_;
   MessagingListenerDelegate* delegate_ = nullptr;
 
-  // The messaging thread's.
+  // Used by the messaging thread only.
   Epoll epoll_;
   const std::shared_ptr<IoWaker> waker_ = std::make_shared<IoWaker>();
   RpcStrings texts_;
   std::vector<char> readBuffer_;
   const UnixConnectionContext context_;
-  const std::unique_ptr<WatchdogFeeder> watchdog_;  // none where nobody watches
-  const std::size_t mostConnections_;
+  const std::unique_ptr<WatchdogFeeder> watchdog_;  // null without a watchdog
+  const std::size_t maxConnections_;
   std::unordered_map<std::uint64_t, std::unique_ptr<UnixConnection>> connections_;
   std::uint64_t nextIdentifier_ = kWaker + 1;
   std::optional<std::chrono::steady_clock::time_point> acceptAgainAt_;  // set while accepting is paused

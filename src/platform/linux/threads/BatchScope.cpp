@@ -22,9 +22,9 @@ BatchScope::~BatchScope() {
   currentBatch = nullptr;
 }
 
-bool BatchScope::defer(std::shared_ptr<Deferred> ending) {
+bool BatchScope::defer(std::shared_ptr<Deferred> deferred) {
   if (currentBatch == nullptr) return false;
-  currentBatch->endings_.push_back(std::move(ending));
+  currentBatch->deferred_.push_back(std::move(deferred));
   return true;
 }
 
@@ -35,12 +35,12 @@ void BatchScope::pieceHasRun() {
 
 void BatchScope::end() {
   pieces_ = 0;
-  // By place: an ending may put off another.
-  for (std::size_t at = 0; at < endings_.size(); ++at) {
-    const std::shared_ptr<Deferred> ending = std::move(endings_[at]);
-    ending->endOfBatch();
+  // By index, because endOfBatch() may defer more.
+  for (std::size_t at = 0; at < deferred_.size(); ++at) {
+    const std::shared_ptr<Deferred> deferred = std::move(deferred_[at]);
+    deferred->endOfBatch();
   }
-  endings_.clear();
+  deferred_.clear();
 }
 
 }  // namespace tonewerk

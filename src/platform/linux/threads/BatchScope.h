@@ -7,20 +7,20 @@
 
 namespace tonewerk {
 
-// Pieces of work that a thread runs one right after the other. What each of them would do for the same
-// object, such as sending its replies, can be put off to the end of the batch and is then done once.
+// Groups the pieces of work that a thread runs one right after the other. What each of them would do for the
+// same object, such as sending its replies, can be deferred to the end of the batch and is then done once.
 //
-// While one exists it is the calling thread's batch. One thread.
+// A batch belongs to the thread that makes it, until it is destroyed. A thread has one batch at a time.
 class BatchScope {
  public:
-  // What is put off. Called on the thread that put it off.
+  // Work that is deferred to the end of a batch. Called on the thread that deferred it.
   class Deferred {
    public:
     virtual ~Deferred() = default;
     virtual void endOfBatch() = 0;
   };
 
-  // So long does nothing have to wait for others that follow it.
+  // A batch ends after this many pieces, so that deferred work does not wait longer.
   static constexpr std::size_t kMaxPieces = 32;
 
   BatchScope();
@@ -28,16 +28,16 @@ class BatchScope {
   BatchScope& operator=(const BatchScope&) = delete;
   ~BatchScope();
 
-  // Puts `ending` off to the end of the calling thread's batch. False when it runs none.
-  [[nodiscard]] static bool defer(std::shared_ptr<Deferred> ending);
+  // Defers `deferred` to the end of the calling thread's batch. False when the thread has no batch.
+  [[nodiscard]] static bool defer(std::shared_ptr<Deferred> deferred);
 
-  // A piece of work has run. Ends the batch, and begins the next, after kMaxPieces.
+  // Call it after each piece of work. After kMaxPieces it ends the batch and begins the next one.
   void pieceHasRun();
 
  private:
   void end();
 
-  std::vector<std::shared_ptr<Deferred>> endings_;
+  std::vector<std::shared_ptr<Deferred>> deferred_;
   std::size_t pieces_ = 0;
 };
 

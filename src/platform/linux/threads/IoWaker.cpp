@@ -12,7 +12,7 @@ void IoWaker::wake(std::uint64_t connection) {
   {
     const MutexLock lock(mutex_);
     waiting_.push_back(connection);
-    if (waiting_.size() > 1) return;  // whoever came first has signalled
+    if (waiting_.size() > 1) return;  // the first one has signalled
   }
   // Fails only when the counter is full, after 2^64 signals.
   static_cast<void>(::eventfd_write(event_.get(), 1));

@@ -9,8 +9,8 @@
 
 namespace tonewerk {
 
-// Tells the I/O thread which connections want to be looked at: one has a reply to send, another room for
-// requests. However many ask while the I/O thread is busy, one signal to it is enough.
+// Tells the I/O thread which connections need attention: one has a reply to send, another has room for
+// requests again. One signal is enough for all that ask while the I/O thread is busy.
 class IoWaker {
  public:
   IoWaker();
@@ -18,10 +18,10 @@ class IoWaker {
   // Any thread.
   void wake(std::uint64_t connection);
 
-  // The I/O thread: readable, edge-triggered, when somebody asked. It needs no reading, because every signal
-  // is an edge of its own.
+  // The I/O thread. Becomes readable when a connection asks. Watch it edge-triggered; it need not be read
+  // then, because every signal is a new edge.
   int fileDescriptor() const { return event_.get(); }
-  // The I/O thread: who asked since the last call.
+  // The I/O thread. The connections that asked since the last call.
   [[nodiscard]] std::vector<std::uint64_t> take();
 
  private:

@@ -10,7 +10,7 @@
 namespace tonewerk {
 namespace {
 
-constexpr int kNiceness = 5;  // a thread would otherwise inherit that of the one that starts it
+constexpr int kNiceness = 5;  // otherwise a thread inherits the niceness of the thread that starts it
 
 }  // namespace
 

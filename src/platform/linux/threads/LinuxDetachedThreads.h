@@ -5,7 +5,8 @@
 
 namespace tonewerk {
 
-// Threads behind everything a user waits for, as is what they start.
+// Starts threads with a lower priority than everything a user waits for. Processes that they start inherit
+// it.
 class LinuxDetachedThreads final : public DetachedThreads {
  public:
   [[nodiscard]] std::error_code start(std::string_view name, Task work) override;

@@ -27,11 +27,11 @@ std::chrono::nanoseconds SystemClock::monotonic() const {
 }
 
 std::chrono::minutes SystemClock::utcOffset(double at) const {
-  constexpr double kFarthest = 1e15;  // some thirty million years
-  if (!(std::fabs(at) < kFarthest)) return std::chrono::minutes(0);
+  constexpr double kMaxSeconds = 1e15;  // seconds, about thirty million years
+  if (!(std::fabs(at) < kMaxSeconds)) return std::chrono::minutes(0);
   const auto seconds = static_cast<std::time_t>(std::floor(at));
   std::tm local{};
-  tzset();  // localtime_r() need not look for a changed time zone
+  tzset();  // because localtime_r() may not notice a changed time zone
   if (localtime_r(&seconds, &local) == nullptr) return std::chrono::minutes(0);
   return std::chrono::duration_cast<std::chrono::minutes>(std::chrono::seconds(local.tm_gmtoff));
 }

@@ -15,7 +15,7 @@ void nameThisThread(std::string_view name) {
 }
 
 void setNicenessOfThisThread(int niceness) {
-  // Linux keeps niceness by thread. Without the permission it stays at the process's.
+  // On Linux each thread has its own niceness. Without the permission it stays unchanged.
   setpriority(PRIO_PROCESS, static_cast<id_t>(gettid()), niceness);
 }
 

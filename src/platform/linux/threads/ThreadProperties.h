@@ -5,11 +5,12 @@
 
 namespace tonewerk {
 
-// The name that debuggers and process tables show; the kernel keeps the last 15 bytes of it, because names
-// such as "com.orvane.audio.work" differ at their end.
+// Sets the name that debuggers and process tables show. The kernel allows 15 bytes. Of a longer name the last
+// 15 are used, because names such as "com.orvane.audio.work" differ at their end.
 void nameThisThread(std::string_view name);
 
-// From -20 (first) to 19 (last). Below 0 only for processes that may; for others the thread stays as it is.
+// From -20 (highest priority) to 19 (lowest). Values below 0 need a permission; without it the niceness stays
+// unchanged.
 void setNicenessOfThisThread(int niceness);
 
 }  // namespace tonewerk

@@ -11,10 +11,11 @@
 namespace tonewerk {
 namespace {
 
-// A burst's memory is given back when the burst is over.
+// A larger buffer is freed after the burst that needed it.
 constexpr std::size_t kMaxKeptCapacity = 4096;
 
-// Niceness: ahead of ordinary threads where that is allowed, behind them for what nobody waits for.
+// Niceness. User-interactive queues run before ordinary threads where that is permitted, utility queues after
+// them.
 constexpr int kUserInteractiveNiceness = -10;
 constexpr int kUtilityNiceness = 5;
 
@@ -46,9 +47,9 @@ void ThreadQueue::async(Task work) {
 void ThreadQueue::drain() {
   assert(!isCurrent());
   std::promise<void> promise;
-  const std::future<void> reached = promise.get_future();
-  async([held = std::move(promise)]() mutable { held.set_value(); });
-  reached.wait();
+  const std::future<void> future = promise.get_future();
+  async([reached = std::move(promise)]() mutable { reached.set_value(); });
+  future.wait();
 }
 
 void ThreadQueue::run() {
@@ -57,13 +58,13 @@ void ThreadQueue::run() {
                                                                        : kUtilityNiceness);
   std::vector<Task> batch;
   while (waitForWork(batch)) {
-    BatchScope together;
-    for (Task& held : batch) {
+    BatchScope scope;
+    for (Task& next : batch) {
       {
-        const Task work = std::move(held);  // destroyed before the next piece runs
+        const Task work = std::move(next);  // destroyed before the next piece of work runs
         work();
       }
-      together.pieceHasRun();
+      scope.pieceHasRun();
     }
     batch.clear();
     if (batch.capacity() > kMaxKeptCapacity) std::vector<Task>().swap(batch);

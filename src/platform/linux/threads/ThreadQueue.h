@@ -9,10 +9,10 @@
 
 namespace tonewerk {
 
-// A serial queue with a thread of its own.
+// Runs a serial queue's work on its own thread.
 //
-// async() takes a lock for the length of a push and wakes the thread only when it waits; the thread takes all
-// that waits at once. Work runs outside the lock.
+// async() holds the lock only while it adds the work, and wakes the thread only when it is waiting. The
+// thread takes all pending work at once and runs it without the lock.
 class ThreadQueue final : public SerialQueue {
  public:
   ThreadQueue(std::string name, QueuePriority priority);
@@ -27,17 +27,18 @@ class ThreadQueue final : public SerialQueue {
 
  private:
   void run();
-  // False when the queue ends and nothing is left.
+  // Moves all pending work into `batch`, which is empty before. False when the queue ends and no work is
+  // left.
   [[nodiscard]] bool waitForWork(std::vector<Task>& batch);
 
   const std::string name_;
   const QueuePriority priority_;
   Mutex mutex_;
   std::vector<Task> pending_ GUARDED_BY(mutex_);
-  bool isWaiting_ GUARDED_BY(mutex_) = false;  // the thread sleeps, or is about to
+  bool isWaiting_ GUARDED_BY(mutex_) = false;  // the thread waits for work, or is about to
   bool isEnding_ GUARDED_BY(mutex_) = false;
   Condition workArrived_;
-  std::thread thread_;  // last: it uses all above
+  std::thread thread_;  // last, because it uses all members above
 };
 
 }  // namespace tonewerk

@@ -5,7 +5,7 @@
 
 namespace tonewerk {
 
-// Makes queues that have a thread each. Any thread.
+// Makes queues that each have their own thread. Any thread.
 class ThreadQueueFactory final : public SerialQueueFactory {
  public:
   [[nodiscard]] std::unique_ptr<SerialQueue> makeSerialQueue(std::string name,

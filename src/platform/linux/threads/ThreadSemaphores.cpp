@@ -8,7 +8,7 @@
 namespace tonewerk {
 namespace {
 
-// Not the library's own: g++ 12's can sleep through a signal.
+// Replaces std::counting_semaphore: that of g++ 12 can miss a signal.
 class ThreadSemaphore final : public Semaphore {
  public:
   void signal() override {

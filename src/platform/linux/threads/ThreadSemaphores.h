@@ -5,7 +5,7 @@
 
 namespace tonewerk {
 
-// Semaphores for threads that sleep. Waits follow the monotonic clock.
+// Makes semaphores on which threads block. Time-outs follow the monotonic clock.
 class ThreadSemaphores final : public SemaphoreFactory {
  public:
   [[nodiscard]] std::unique_ptr<Semaphore> makeSemaphore() override;

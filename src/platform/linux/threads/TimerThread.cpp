@@ -35,7 +35,7 @@ struct TimerThread::Schedule {
     changed.notifyOne();
   }
 
-  // The thread is not woken: it finds out when it would have run the tick.
+  // Does not wake the thread, which notices when it would have run the tick.
   void remove(const std::shared_ptr<Entry>& entry) {
     const MutexLock lock(mutex);
     std::erase(entries, entry);
@@ -49,7 +49,7 @@ struct TimerThread::Schedule {
     changed.notifyOne();
   }
 
-  // Waits for the next tick that is due, and sets when the one after it will be. Null when the service ends.
+  // Waits for the next tick that is due and sets the time of the one after it. Null when the service ends.
   std::shared_ptr<Entry> waitForDue() {
     MutexLock lock(mutex);
     for (;;) {
@@ -64,11 +64,11 @@ struct TimerThread::Schedule {
       const MonotonicTime now = std::chrono::steady_clock::now();
       if (entry->due > now) {
         const MonotonicTime until = entry->due;
-        entry.reset();  // the timer's owner may destroy the tick meanwhile
+        entry.reset();  // so that the tick is freed if its timer is destroyed meanwhile
         changed.waitUntil(lock, until);
         continue;
       }
-      // Missed ticks are not made up for: the next one is the first that still lies ahead.
+      // Missed ticks are dropped: the next tick is the first one in the future.
       entry->due += entry->interval * ((now - entry->due) / entry->interval + 1);
       return entry;
     }

@@ -8,11 +8,11 @@
 
 namespace tonewerk {
 
-// Timers on one thread, which sleeps until the next tick is due. Time is the monotonic clock's, which stands
-// still while the device sleeps.
+// Runs timers on one thread, which sleeps until the next tick is due. It uses the monotonic clock, which does
+// not advance while the device is suspended.
 //
-// repeat() from any thread, also from inside a tick. Timers may outlive the service; they are then silent.
-// The service is not destroyed from a tick.
+// repeat() may be called from any thread, also from inside a tick. Timers may outlive the service and then
+// never tick. Do not destroy the service from a tick.
 class TimerThread final : public TimerService {
  public:
   TimerThread();
@@ -30,7 +30,7 @@ class TimerThread final : public TimerService {
   class ScheduledTimer;
 
   std::shared_ptr<Schedule> schedule_;  // shared with the timers
-  std::thread thread_;                  // last: it uses the schedule
+  std::thread thread_;                  // last, because it uses the schedule
 };
 
 }  // namespace tonewerk

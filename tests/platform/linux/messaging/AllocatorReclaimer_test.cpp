@@ -46,7 +46,7 @@ class AllocatorReclaimerTest : public ::testing::Test {
 
 TEST_F(AllocatorReclaimerTest, GivesBackASecondLaterWhatTheAllocatorKeeps) {
   idle = kSpare + 1;
-  reclaimer.lookSoon();
+  reclaimer.scheduleChecks();
   EXPECT_EQ(given, 0);
   clock.advance(1.0);
   EXPECT_EQ(given, 1);
@@ -54,20 +54,20 @@ TEST_F(AllocatorReclaimerTest, GivesBackASecondLaterWhatTheAllocatorKeeps) {
 
 TEST_F(AllocatorReclaimerTest, LeavesTheAllocatorWhatIsNotWorthIt) {
   idle = kSpare;
-  reclaimer.lookSoon();
+  reclaimer.scheduleChecks();
   clock.advance(100.0);
   EXPECT_GT(looks, 0);
   EXPECT_EQ(given, 0);
 }
 
 TEST_F(AllocatorReclaimerTest, LooksAgainForWhatIsStillBeingWrittenAndThenNoMore) {
-  reclaimer.lookSoon();
+  reclaimer.scheduleChecks();
   EXPECT_THAT(looksWithin(100), ElementsAre(1, 2, 4, 8, 16, 32));
   EXPECT_EQ(timers.count(), 0U);
 }
 
 TEST_F(AllocatorReclaimerTest, GivesBackAtALaterLookWhatOthersHeldAtTheFirst) {
-  reclaimer.lookSoon();
+  reclaimer.scheduleChecks();
   clock.advance(5.0);
   EXPECT_EQ(given, 0);
   idle = 10 * kSpare;
@@ -76,38 +76,38 @@ TEST_F(AllocatorReclaimerTest, GivesBackAtALaterLookWhatOthersHeldAtTheFirst) {
 }
 
 TEST_F(AllocatorReclaimerTest, WhoAsksDuringTheLooksGetsAllOfThemOnceMore) {
-  reclaimer.lookSoon();
+  reclaimer.scheduleChecks();
   EXPECT_THAT(looksWithin(31), ElementsAre(1, 2, 4, 8, 16));
-  reclaimer.lookSoon();
-  reclaimer.lookSoon();
+  reclaimer.scheduleChecks();
+  reclaimer.scheduleChecks();
   EXPECT_EQ(timers.count(), 1U);
   EXPECT_THAT(looksWithin(100), ElementsAre(1, 2, 3, 5, 9, 17, 33));
   EXPECT_EQ(timers.count(), 0U);
 }
 
 TEST_F(AllocatorReclaimerTest, LooksBeginAnewForWhoAsksLater) {
-  reclaimer.lookSoon();
+  reclaimer.scheduleChecks();
   clock.advance(1000.0);
   EXPECT_EQ(timers.count(), 0U);
-  reclaimer.lookSoon();
+  reclaimer.scheduleChecks();
   EXPECT_THAT(looksWithin(3), ElementsAre(1, 2));
 }
 
 TEST_F(AllocatorReclaimerTest, LooksForWhatClientsBringOnceItIsMuchForAllTogether) {
-  reclaimer.clientBrought(AllocatorReclaimer::kMuchBytes - 1);
-  reclaimer.clientWent();
+  reclaimer.clientSent(AllocatorReclaimer::kSentBytesThreshold - 1);
+  reclaimer.clientEnded();
   EXPECT_EQ(timers.count(), 0U);
-  reclaimer.clientBrought(1);
+  reclaimer.clientSent(1);
   EXPECT_EQ(timers.count(), 1U);
 }
 
 // Of what they brought, another's session may hold the most, and end by a request of a few bytes.
 TEST_F(AllocatorReclaimerTest, LooksAgainForWhateverClientsDoAfterTheyHaveBroughtMuch) {
-  reclaimer.clientBrought(AllocatorReclaimer::kMuchBytes);
+  reclaimer.clientSent(AllocatorReclaimer::kSentBytesThreshold);
   clock.advance(1000.0);
-  reclaimer.clientBrought(1);
+  reclaimer.clientSent(1);
   EXPECT_THAT(looksWithin(100), ElementsAre(1, 2, 4, 8, 16, 32));
-  reclaimer.clientWent();
+  reclaimer.clientEnded();
   EXPECT_THAT(looksWithin(100), ElementsAre(1, 2, 4, 8, 16, 32));
 }
 

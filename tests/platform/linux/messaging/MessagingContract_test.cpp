@@ -395,7 +395,7 @@ TYPED_TEST_SUITE(ReclaimingContractTest, SidesOfProcesses);
 // Many small clients leave as much behind as a large one, and none of them brought much itself.
 TYPED_TEST(ReclaimingContractTest, AsksForLooksOnceClientsHaveBroughtMuchTogether) {
   constexpr std::size_t kClients = 5;
-  const std::string text(AllocatorReclaimer::kMuchBytes / kClients, 'x');
+  const std::string text(AllocatorReclaimer::kSentBytesThreshold / kClients, 'x');
   for (std::size_t client = 1; client <= kClients; ++client) {
     EXPECT_EQ(this->timers.count(), 0U);
     this->side.connect();
@@ -409,7 +409,7 @@ TYPED_TEST(ReclaimingContractTest, AsksForLooksOnceClientsHaveBroughtMuchTogethe
 }
 
 TYPED_TEST(ReclaimingContractTest, AsksForLooksAtAClientsEnd) {
-  this->memory.clientBrought(AllocatorReclaimer::kMuchBytes);
+  this->memory.clientSent(AllocatorReclaimer::kSentBytesThreshold);
   this->side.connect();
   ASSERT_TRUE(this->record.waitForEvents(1));
   this->clock.advance(100.0);  // what was asked for so far

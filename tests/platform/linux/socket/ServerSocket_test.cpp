@@ -132,12 +132,12 @@ TEST_F(ServerSocketTest, IsMadeAgainInADirectoryThatIsMadeAgain) {
 
   std::filesystem::remove_all(run);
   EXPECT_FALSE(socket->isInPlace());
-  EXPECT_EQ(socket->madeAgain(problem), nullptr);
+  EXPECT_EQ(socket->recreate(problem), nullptr);
   EXPECT_EQ(problem, inRun + " went with its directory, and comes back with it");
   EXPECT_FALSE(std::filesystem::exists(run));
 
   std::filesystem::create_directory(run);
-  const auto again = socket->madeAgain(problem);
+  const auto again = socket->recreate(problem);
   ASSERT_NE(again, nullptr) << problem;
   EXPECT_TRUE(again->isInPlace());
   EXPECT_FALSE(socket->isInPlace());
@@ -151,7 +151,7 @@ TEST_F(ServerSocketTest, IsNotMadeAgainWhereAnotherProcessListensByNow) {
   const auto others = open();
   ASSERT_NE(others, nullptr);
   EXPECT_FALSE(socket->isInPlace());
-  EXPECT_EQ(socket->madeAgain(problem), nullptr);
+  EXPECT_EQ(socket->recreate(problem), nullptr);
   EXPECT_THAT(problem, HasSubstr("is in use by"));
   EXPECT_TRUE(others->isInPlace());
 }
@@ -162,12 +162,12 @@ TEST_F(ServerSocketTest, IsNotMadeAgainWhileAnotherProcessLocksTheDirectory) {
   ASSERT_NE(socket, nullptr);
   std::filesystem::remove(path);
   FileDescriptor others = lockOfAnother();
-  EXPECT_EQ(socket->madeAgain(problem), nullptr);
+  EXPECT_EQ(socket->recreate(problem), nullptr);
   EXPECT_EQ(problem, directory.path() + " is locked by another process");
   EXPECT_FALSE(std::filesystem::exists(path));
 
   others.reset();
-  EXPECT_NE(socket->madeAgain(problem), nullptr);
+  EXPECT_NE(socket->recreate(problem), nullptr);
 }
 
 TEST_F(ServerSocketTest, LeavesItsFileToTheNextOneWhileAnotherProcessLocksTheDirectory) {
@@ -214,7 +214,7 @@ int takesThePassedSocket(int listening, const std::string& path, const std::stri
   if (std::getenv("LISTEN_FDS") != nullptr) return 15;
   if (!socket->isInPlace()) return 17;
   std::filesystem::rename(path, path + ".away");
-  const bool isMissed = !socket->isInPlace() && socket->madeAgain(problem) == nullptr &&
+  const bool isMissed = !socket->isInPlace() && socket->recreate(problem) == nullptr &&
                         problem.find("restart twreportingd.socket") != std::string::npos;
   if (!isMissed || std::filesystem::exists(path)) return 18;
   std::filesystem::rename(path + ".away", path);
