@@ -38,11 +38,11 @@ bool hasChildren() {
 bool isRunning(const std::string& process) {
   std::string status;
   if (readTextFile("/proc/" + process + "/stat", status)) return false;
-  return status.find(") Z") == std::string::npos;  // a zombie has ended, and is its new parent's
+  return status.find(") Z") == std::string::npos;  // a zombie has ended; its new parent will reap it
 }
 
-// Its ending was brought about before; it may take the kernel a moment.
-bool ends(const std::string& process) {
+// Waits for the end of a process that was killed before, which may take the kernel a moment.
+bool hasEndedSoon(const std::string& process) {
   const FileDescriptor watch(static_cast<int>(syscall(SYS_pidfd_open, std::stoi(process), 0)));
   if (!watch) return errno == ESRCH;
   pollfd waited{watch.get(), POLLIN, 0};
@@ -72,7 +72,7 @@ TEST(BoundedCommandTest, SaysWhenThereIsNoSuchProgram) {
   EXPECT_FALSE(hasChildren());
 }
 
-TEST(BoundedCommandTest, GivesTheShellsStatusForWhatItCannotStart) {
+TEST(BoundedCommandTest, GivesTheShellsStatusForACommandItCannotStart) {
   EXPECT_EQ(shell("/nowhere/tool").status, 127);
   EXPECT_EQ(shell("/etc/passwd").status, 126);
 }
@@ -85,7 +85,7 @@ TEST(BoundedCommandTest, SaysWhichSignalEndedIt) {
   EXPECT_EQ(result.problem, "ended by signal 11");
 }
 
-TEST(BoundedCommandTest, EndsWhatHangsAndKeepsWhatItWrote) {
+TEST(BoundedCommandTest, EndsAHangingProgramAndKeepsItsOutput) {
   const BoundedCommand::Result result = shell("echo before; exec sleep 1000", kShort);
   EXPECT_EQ(result.end, End::kTimedOut);
   EXPECT_EQ(result.output, "before\n");
@@ -93,17 +93,17 @@ TEST(BoundedCommandTest, EndsWhatHangsAndKeepsWhatItWrote) {
   EXPECT_FALSE(hasChildren());
 }
 
-TEST(BoundedCommandTest, EndsWhatIgnoresEverySignalItCan) {
+TEST(BoundedCommandTest, EndsAProgramThatIgnoresSignals) {
   EXPECT_EQ(shell("trap '' TERM INT HUP PIPE; while :; do :; done", kShort).end, End::kTimedOut);
   EXPECT_FALSE(hasChildren());
 }
 
-TEST(BoundedCommandTest, EndsWhatHasClosedItsOutputAndHangs) {
+TEST(BoundedCommandTest, EndsAHangingProgramThatHasClosedItsOutput) {
   EXPECT_EQ(shell("exec >&-; exec sleep 1000", kShort).end, End::kTimedOut);
   EXPECT_FALSE(hasChildren());
 }
 
-TEST(BoundedCommandTest, EndsWhatWritesWithoutEnd) {
+TEST(BoundedCommandTest, EndsAProgramThatWritesWithoutEnd) {
   const BoundedCommand::Result result = shell("exec yes", {30s, 100'000});
   EXPECT_EQ(result.end, End::kTooMuchOutput);
   EXPECT_THAT(result.output, SizeIs(100'000));
@@ -111,7 +111,7 @@ TEST(BoundedCommandTest, EndsWhatWritesWithoutEnd) {
   EXPECT_FALSE(hasChildren());
 }
 
-TEST(BoundedCommandTest, TakesExactlyAsMuchAsTheBound) {
+TEST(BoundedCommandTest, TakesOutputUpToTheLimit) {
   EXPECT_EQ(shell("printf 1234567890", {30s, 10}).end, End::kExited);
   const BoundedCommand::Result over = shell("printf 12345678901", {30s, 10});
   EXPECT_EQ(over.end, End::kTooMuchOutput);
@@ -125,14 +125,14 @@ TEST(BoundedCommandTest, TakesMoreThanAPipeHolds) {
 }
 
 TEST(BoundedCommandTest, DoesNotWaitForAGrandchildThatHoldsThePipe) {
-  // With the bound in time this would time out.
+  // Waiting for it would time out.
   const BoundedCommand::Result result = shell("sleep 1000 & echo $!");
   EXPECT_EQ(result.end, End::kExited);
-  EXPECT_TRUE(ends(result.output.substr(0, result.output.find('\n'))));
+  EXPECT_TRUE(hasEndedSoon(result.output.substr(0, result.output.find('\n'))));
 }
 
 TEST(BoundedCommandTest, DoesNotWaitForAGrandchildThatLeftTheProcessGroup) {
-  // The shell ends when the grandchild has left and said who it is.
+  // The shell hasEndedSoon when the grandchild has left the group and written its process identifier.
   const TemporaryDirectory directory;
   const std::string fifo = directory.path("left");
   const BoundedCommand::Result result = shell("mkfifo " + fifo + "; setsid sh -c 'echo $$; echo > " + fifo +
@@ -140,19 +140,19 @@ TEST(BoundedCommandTest, DoesNotWaitForAGrandchildThatLeftTheProcessGroup) {
   EXPECT_EQ(result.end, End::kExited);
   const std::string process = result.output.substr(0, result.output.find('\n'));
   ASSERT_NE(process, "");
-  EXPECT_TRUE(isRunning(process));  // the one thing that gets away
+  EXPECT_TRUE(isRunning(process));  // the documented exception
   kill(std::stoi(process), SIGKILL);
 }
 
-TEST(BoundedCommandTest, TakesWhatItStartedAlongWhenTimeIsOver) {
+TEST(BoundedCommandTest, EndsTheProgramsChildrenAtTheTimeLimit) {
   const BoundedCommand::Result result = shell("sleep 1000 & echo $!; wait", kShort);
   EXPECT_EQ(result.end, End::kTimedOut);
-  EXPECT_TRUE(ends(result.output.substr(0, result.output.find('\n'))));
+  EXPECT_TRUE(hasEndedSoon(result.output.substr(0, result.output.find('\n'))));
 }
 
-TEST(BoundedCommandTest, GivesTheProgramNoDescriptorsOfOurs) {
+TEST(BoundedCommandTest, GivesTheProgramNoOtherDescriptors) {
   const TemporaryDirectory directory;
-  const int open = dup(STDOUT_FILENO);  // one without the close-on-exec flag
+  const int open = dup(STDOUT_FILENO);  // without the close-on-exec flag
   ASSERT_GT(open, 2);
   EXPECT_EQ(shell("ls /proc/self/fd | sort -n | tr '\\n' ' '").output, "0 1 2 3 ");  // 3 is ls's own
   close(open);
@@ -166,7 +166,7 @@ TEST(BoundedCommandTest, GivesTheProgramAnEmptyInputAndDefaultSignals) {
   const BoundedCommand::Result result = shell("cat; grep -E '^Sig(Blk|Ign)' /proc/self/status");
   sigaction(SIGPIPE, &before, nullptr);
   EXPECT_THAT(result.output, HasSubstr("SigBlk:\t0000000000000000\n"));
-  // The first 28, SIGPIPE among them; 32 and 33 are the C library's own.
+  // Checks the first 28 signals, which include SIGPIPE. The C library uses 32 and 33 itself.
   EXPECT_THAT(result.output, MatchesRegex("(.|\n)*SigIgn:\t[0-9a-f]{9}0000000\n"));
 }
 

@@ -21,7 +21,7 @@ using ::testing::SizeIs;
 using ::testing::StartsWith;
 using End = CommandRunner::End;
 
-// Generous: only tests that mean to pass it come near it.
+// Large enough that only the tests of a limit reach it.
 constexpr CommandRunner::Limits kLimits{1 << 20, std::chrono::minutes(1)};
 
 class LinuxCommandRunnerTest : public ::testing::Test {
@@ -42,14 +42,14 @@ TEST_F(LinuxCommandRunnerTest, GivesOutputByteForByte) {
   EXPECT_EQ(result.output, std::string("a\0b\377\nno newline", 15));
 }
 
-TEST_F(LinuxCommandRunnerTest, AnEmptyCommandEndsWell) {
+TEST_F(LinuxCommandRunnerTest, AnEmptyCommandExitsWithStatusZero) {
   const auto result = runner.run("", kLimits);
   EXPECT_EQ(result.end, End::kExited);
   EXPECT_EQ(result.number, 0);
   EXPECT_THAT(result.output, IsEmpty());
 }
 
-TEST_F(LinuxCommandRunnerTest, ACommandThatIsNotThereIsNotStarted) {
+TEST_F(LinuxCommandRunnerTest, AMissingCommandIsNotStarted) {
   EXPECT_EQ(runner.run("/nowhere/tonewerk-no-such-tool", kLimits).end, End::kNotStarted);
 }
 
@@ -58,7 +58,7 @@ TEST_F(LinuxCommandRunnerTest, ACommandThatMayNotBeRunIsNotStarted) {
   EXPECT_EQ(runner.run(directory.path("tool"), kLimits).end, End::kNotStarted);
 }
 
-TEST_F(LinuxCommandRunnerTest, AStatusOf127AfterOutputIsAStatusLikeAnyOther) {
+TEST_F(LinuxCommandRunnerTest, AStatusOf127AfterOutputIsAnExitStatus) {
   const auto result = runner.run("echo said; exit 127", kLimits);
   EXPECT_EQ(result.end, End::kExited);
   EXPECT_EQ(result.number, 127);
@@ -79,15 +79,15 @@ TEST_F(LinuxCommandRunnerTest, AToolThatHangsIsStopped) {
   EXPECT_EQ(result.output, "before\n");
 }
 
-TEST_F(LinuxCommandRunnerTest, AToolThatDiesIsSaidToHave) {
+TEST_F(LinuxCommandRunnerTest, ReportsTheSignalThatEndedATool) {
   const auto result = runner.run("echo last words; kill -SEGV $$", kLimits);
   EXPECT_EQ(result.end, End::kSignalled);
   EXPECT_EQ(result.number, SIGSEGV);
   EXPECT_EQ(result.output, "last words\n");
 }
 
-TEST_F(LinuxCommandRunnerTest, AGrandchildThatKeepsThePipeOpenHoldsNobody) {
-  const auto result = runner.run("sleep 3600 & echo gone ahead", kLimits);  // or its time would be over
+TEST_F(LinuxCommandRunnerTest, DoesNotWaitForAGrandchildThatKeepsThePipeOpen) {
+  const auto result = runner.run("sleep 3600 & echo gone ahead", kLimits);  // waiting for it would time out
   EXPECT_EQ(result.end, End::kExited);
   EXPECT_EQ(result.output, "gone ahead\n");
 }

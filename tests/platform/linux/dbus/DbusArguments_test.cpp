@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What no bus lets through, but another kind of bus might: messages whose bodies are not what their
-// signatures say. Here the test writes the bytes itself.
+// Tests messages whose bodies do not match their signatures. The usual bus does not forward them, but another
+// one might, so the tests write the bytes themselves.
 #include "platform/linux/dbus/DbusArguments.h"
 
 #include <array>
@@ -48,7 +48,7 @@ std::string mapBody(std::endian order = std::endian::little) {
   return body.text();
 }
 
-// Reads what comes in at one end of a socket as the daemon does.
+// Reads messages from one end of a socket pair, as the daemon does.
 class ReadingEnd {
  public:
   ReadingEnd() {
@@ -70,7 +70,8 @@ class ReadingEnd {
     EXPECT_GT(sd_bus_is_ready(bus), 0);
   }
 
-  // What came of a message; none when the library did not take it for one, which ends the connection.
+  // The arguments of a message. None when the library does not accept it as a message, which ends the
+  // connection.
   std::optional<DbusArguments> read(const std::string& message) {
     read_.reset();
     write(message);
@@ -99,7 +100,7 @@ class ReadingEnd {
   Bus bus_;
 };
 
-// Text is UTF-8, dates are numbers, nothing is deeper than it may be.
+// Expects that texts are UTF-8, dates are finite and nothing is nested too deep.
 void expectSound(const Value& value, std::size_t depth) {
   ASSERT_LE(depth, kMaxFrameDepth);
   const SharedString* text = value.asString();
@@ -119,7 +120,7 @@ void expectSound(const Value& value, std::size_t depth) {
 
 class DbusArgumentsOrderTest : public testing::TestWithParam<std::endian> {};
 
-TEST_P(DbusArgumentsOrderTest, ReadsWhatTheTestWrites) {
+TEST_P(DbusArgumentsOrderTest, ReadsAMapInEitherByteOrder) {
   ReadingEnd end;
   const std::optional<DbusArguments> read = end.read(messageOf("a{sv}", mapBody(GetParam()), GetParam()));
   ASSERT_TRUE(read);
@@ -137,7 +138,7 @@ INSTANTIATE_TEST_SUITE_P(All, DbusArgumentsOrderTest, testing::Values(std::endia
                            return tested.param == std::endian::native ? "ThisMachines" : "TheOther";
                          });
 
-// The bus library decides what is text on this way, and isText() on the other.
+// On D-Bus the library decides which bytes are text, on the socket isText().
 TEST(DbusArgumentsTest, RefusesTheTextsThatTheSocketRefuses) {
   for (const char* text : {"\xFF", "\xED\xA0\x80", "\xEF\xBF\xBE", "\xEF\xBF\xBF", "\xEF\xB7\x90",
                            "\xEF\xB7\xAF", "\xF0\x9F\xBF\xBE", "\xF4\x8F\xBF\xBF"}) {
@@ -152,7 +153,7 @@ TEST(DbusArgumentsTest, RefusesTheTextsThatTheSocketRefuses) {
   }
 }
 
-// They were told of as text that is not UTF-8, too.
+// The error once called these text that is not UTF-8, too.
 TEST(DbusArgumentsTest, NamesAPathOrASignatureThatIsMalformed) {
   DbusBytes path;
   path.array(8, [](DbusBytes& map) { map.entry("path", "o").string("no/path"); });
@@ -173,7 +174,7 @@ TEST(DbusArgumentsTest, NamesAPathOrASignatureThatIsMalformed) {
   }
 }
 
-TEST(DbusArgumentsTest, TakesTheTextsBesideThem) {
+TEST(DbusArgumentsTest, TakesTheNeighboursOfThoseTexts) {
   for (const char* text : {"\xEF\xBF\xBD", "\xEF\xB7\x8F", "\xEF\xB7\xB0", "\xF0\x9F\xBF\xBD",
                            "\xF0\x90\x80\x80", "\xEE\xBF\xBF"}) {
     DbusBytes body;
@@ -185,7 +186,7 @@ TEST(DbusArgumentsTest, TakesTheTextsBesideThem) {
   }
 }
 
-TEST(DbusArgumentsTest, SurvivesWhateverABodyHolds) {
+TEST(DbusArgumentsTest, SurvivesRandomChangesToABody) {
   constexpr int kMessages = 20'000;
   const std::string whole = mapBody();
   std::mt19937 random(1);  // the same every time
@@ -196,7 +197,7 @@ TEST(DbusArgumentsTest, SurvivesWhateverABodyHolds) {
   for (int at = 0; at < kMessages; ++at) {
     std::string body = whole;
     for (std::size_t changes = 1 + below(3); changes > 0; --changes) {
-      // Mostly letters that are types, and small lengths.
+      // Mostly type codes and small lengths.
       constexpr std::string_view kBytes("ybnqiuxtdsogavh(){}\0\1\2\3\4\10\20\377", 27);
       body[below(body.size())] = kBytes[below(kBytes.size())];
     }

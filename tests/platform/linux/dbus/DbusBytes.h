@@ -10,7 +10,8 @@
 
 namespace tonewerk {
 
-// Values as D-Bus messages have them, in either byte order, for what no library of this machine writes.
+// Writes values as D-Bus messages contain them, in either byte order, because the library writes only this
+// machine's order.
 class DbusBytes {
  public:
   explicit DbusBytes(std::endian order = std::endian::little) : order_(order) {}
@@ -40,7 +41,7 @@ class DbusBytes {
     text_ += text;
     return byte(0);
   }
-  // An array's length and what `fill` appends, of elements with that alignment.
+  // Appends an array: its length, and the elements that `fill` appends. `alignment` is that of an element.
   template <typename Fill>
   DbusBytes& array(std::size_t alignment, Fill fill) {
     const std::size_t length = align(4).size();
@@ -50,7 +51,7 @@ class DbusBytes {
     text_.replace(length, bytes.size(), bytes.text());
     return *this;
   }
-  // The start of a dictionary's entry with a variant in it.
+  // Appends the start of a dictionary's entry whose value is a variant.
   DbusBytes& entry(std::string_view key, std::string_view type) {
     return align(8).string(key).signature(type);
   }
@@ -68,7 +69,7 @@ class DbusBytes {
   std::string text_;
 };
 
-// Where a call goes. What is empty is not said.
+// The target of a call. Empty fields are left out of the message.
 struct DbusCallTarget {
   std::string path;
   std::string member;

@@ -16,7 +16,7 @@
 
 namespace tonewerk {
 
-// What a call was answered with.
+// The answer to a call.
 struct DbusReceived {
   std::string error;  // its name; empty without
   std::string text;   // the error's message
@@ -25,7 +25,7 @@ struct DbusReceived {
   std::string signature() const {
     return message == nullptr ? "" : sd_bus_message_get_signature(message.get(), 1);
   }
-  // What the message begins with.
+  // Read the first value of the message.
   bool boolean() const {
     int value = 0;
     EXPECT_GT(sd_bus_message_read(message.get(), "b", &value), 0) << error << ": " << text;
@@ -45,7 +45,7 @@ struct DbusReceived {
   }
 };
 
-// A process on the bus that calls the service; all on the test's own thread.
+// Calls the service as another process on the bus would. Works on the test's own thread.
 class DbusCaller {
  public:
   static constexpr std::chrono::microseconds kTimeout = std::chrono::seconds(30);
@@ -76,7 +76,7 @@ class DbusCaller {
         sd_bus_message_new_method_call(bus_.get(), &made, name.c_str(), path.c_str(), interface, member), 0);
     return BusMessage(made);
   }
-  // As sd_bus_message_append() takes them.
+  // `types` and `body` are as in sd_bus_message_append().
   template <typename... Body>
   BusMessage newCall(const char* member, const char* types, Body... body) {
     BusMessage call = newCall(member);
@@ -99,7 +99,7 @@ class DbusCaller {
   }
   DbusReceived ask(const char* member) { return ask(newCall(member)); }
 
-  // Waits for nothing; the answer comes into received().
+  // Does not wait. The answer goes to received().
   void send(const BusMessage& call) {
     EXPECT_GE(sd_bus_call_async(bus_.get(), nullptr, call.get(), receive, this,
                                 static_cast<std::uint64_t>(kTimeout.count())),
@@ -111,7 +111,7 @@ class DbusCaller {
   }
 
   const std::vector<DbusReceived>& received() const { return received_; }
-  // Whatever is there already counts.
+  // Counts the answers that are already there.
   [[nodiscard]] bool waitForReceived(std::size_t count) {
     const auto end = std::chrono::steady_clock::now() + kTimeout;
     while (received_.size() < count && std::chrono::steady_clock::now() < end) {
@@ -122,7 +122,7 @@ class DbusCaller {
     return received_.size() >= count;
   }
 
-  // What is still unsent goes out first.
+  // Sends what is still unsent first.
   void disconnect() {
     if (bus_ == nullptr) return;
     sd_bus_flush(bus_.get());

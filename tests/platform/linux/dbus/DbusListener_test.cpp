@@ -7,7 +7,6 @@
 #include <functional>
 #include <gmock/gmock.h>
 #include <memory>
-#include <mutex>
 #include <string>
 #include <thread>
 #include <unistd.h>
@@ -45,14 +44,14 @@ class DbusListenerTest : public testing::Test {
     listener->resume();
   }
 
-  // Until somebody has the name, or nobody.
+  // Waits until a process has the name, or until none has it.
   [[nodiscard]] bool waitForName(bool isOwned = true) const {
     DbusCaller asker(bus.address(),
                      {"org.freedesktop.DBus", "/org/freedesktop/DBus", "org.freedesktop.DBus"});
     return waitFor(asker,
                    [&] { return asker.ask("NameHasOwner", "s", kNames.name.c_str()).boolean() == isOwned; });
   }
-  // Asks `condition` again and again, a little later each time.
+  // Polls `condition` at least every 10 ms.
   [[nodiscard]] static bool waitFor(DbusCaller& caller, const std::function<bool()>& condition) {
     const auto end = std::chrono::steady_clock::now() + kPatience;
     while (!condition()) {
@@ -66,7 +65,7 @@ class DbusListenerTest : public testing::Test {
     const DbusReceived answer = caller.ask("TakeInt64", "x", std::int64_t{1});
     return answer.error.empty() && answer.message != nullptr;
   }
-  // A map of one text of so many characters, and a request with it.
+  // Calls `member` with a map of one text of `size` characters.
   static DbusReceived askWithText(DbusCaller& caller, const char* member, std::size_t size) {
     const BusMessage call = caller.newCall(member);
     appendMap(call.get(), {{"text", std::string(size, 'x')}});
@@ -126,7 +125,7 @@ TEST_F(DbusListenerTest, TakesEveryKindOfValueThatAVariantMayHold) {
   EXPECT_EQ(taken.find("T")->kind(), Value::Kind::kUnsigned);
 }
 
-TEST_F(DbusListenerTest, TakesNumbersThatAreNone) {
+TEST_F(DbusListenerTest, TakesDoublesThatAreNotFinite) {
   DbusCaller caller(bus.address(), kNames);
   const DbusReceived answer =
       caller.ask("TakeMap", "a{sv}", 2, "nan", "d", std::numeric_limits<double>::quiet_NaN(), "infinite", "d",
@@ -173,8 +172,8 @@ TEST_F(DbusListenerTest, TakesEmptyArraysAndMapsOfWhatAVariantMayHold) {
                                                                       {"paths", ValueArray()}}));
 }
 
-// The library reads arrays in one piece, but not these.
-TEST_F(DbusListenerTest, TakesWhatAProgramOfTheOtherByteOrderSays) {
+// The library cannot read arrays of the other byte order in one piece.
+TEST_F(DbusListenerTest, TakesMessagesInTheOtherByteOrder) {
   ForeignDbusCaller caller(bus.address(), kNames);
   const auto body = [] { return ForeignDbusCaller::body(); };
   EXPECT_EQ(caller.ask("TakeList", "ax", body().array(8, [](DbusBytes&) {})).error, "");
@@ -226,7 +225,7 @@ std::function<void(sd_bus_message*)> body(const char* types, Body... values) {
   return [=](sd_bus_message* call) { EXPECT_GE(sd_bus_message_append(call, types, values...), 0); };
 }
 
-TEST_F(DbusListenerTest, RefusesWrongArgumentsInWordsThatNameThem) {
+TEST_F(DbusListenerTest, RefusesWrongArgumentsAndNamesThem) {
   const double nan = std::numeric_limits<double>::quiet_NaN();
   const double infinity = std::numeric_limits<double>::infinity();
   const std::vector<WrongCall> calls = {
@@ -253,7 +252,7 @@ TEST_F(DbusListenerTest, RefusesWrongArgumentsInWordsThatNameThem) {
        "TakeMap: argument 1 (map) holds a variant in a variant"},
       {"TakeMap", body("a{sv}", 1, "a", "a{iv}", 0), "TakeMap: argument 1 (map) has a key that is not text"},
       {"TakeMap", body("a{sv}", 1, "a", "a{ov}", 0), "TakeMap: argument 1 (map) has a key that is not text"},
-      // Though there is nothing in them.
+      // Their types are refused although they are empty.
       {"TakeMap", body("a{sv}", 1, "a", "a(ss)", 0),
        "TakeMap: argument 1 (map) holds a struct other than a date"},
       {"TakeMap", body("a{sv}", 1, "a", "ah", 0), "TakeMap: argument 1 (map) holds a file descriptor"},
@@ -282,7 +281,7 @@ TEST_F(DbusListenerTest, RefusesWrongArgumentsInWordsThatNameThem) {
   EXPECT_TRUE(isServed(caller));
 }
 
-// A map that holds so many arrays inside each other.
+// A call whose map holds `arrays` arrays nested inside each other.
 BusMessage nestedCall(DbusCaller& caller, int arrays) {
   BusMessage call = caller.newCall("TakeMap");
   EXPECT_GE(sd_bus_message_open_container(call.get(), 'a', "{sv}"), 0);
@@ -322,7 +321,7 @@ TEST_F(DbusListenerTest, TakesMessagesOfAMegabyteAndNoLongerOnes) {
   EXPECT_TRUE(isServed(caller));
 }
 
-// Else a few thousand held calls with some each would leave the daemon without.
+// Otherwise a few thousand held calls with descriptors could use up the daemon's descriptors.
 TEST_F(DbusListenerTest, TakesNoFileDescriptors) {
   DbusCaller caller(bus.address(), kNames);
   const DbusReceived answer = caller.ask("TakeMap", "a{sv}", 1, "a", "h", STDERR_FILENO);
@@ -331,7 +330,7 @@ TEST_F(DbusListenerTest, TakesNoFileDescriptors) {
   EXPECT_TRUE(isServed(caller));
 }
 
-TEST_F(DbusListenerTest, AnswersAtLengthAsWell) {
+TEST_F(DbusListenerTest, SendsLongAnswers) {
   const std::string text(900'000, 'x');
   DbusCaller caller(bus.address(), kNames);
   const BusMessage call = caller.newCall("Echo");
@@ -342,7 +341,7 @@ TEST_F(DbusListenerTest, AnswersAtLengthAsWell) {
   EXPECT_TRUE(isServed(caller));
 }
 
-TEST_F(DbusListenerTest, MakesOneConnectionForEachUniqueNameAndSaysWhoItIs) {
+TEST_F(DbusListenerTest, MakesOneConnectionForEachUniqueNameAndReportsItsProcess) {
   DbusCaller first(bus.address(), kNames);
   DbusCaller second(bus.address(), kNames);
   ASSERT_TRUE(isServed(first));
@@ -364,8 +363,8 @@ TEST_F(DbusListenerTest, EndsTheConnectionOfANameThatVanishesAndNoOther) {
   EXPECT_TRUE(isServed(staying));
 }
 
-// As programs do that send a call and do not wait: they are gone before the bus has been asked who they were.
-TEST_F(DbusListenerTest, CarriesOutWhatAClientAskedForBeforeItWent) {
+// Some programs send a call and do not wait. They are gone before the bus is asked for their credentials.
+TEST_F(DbusListenerTest, CarriesOutTheRequestsOfAClientThatIsGone) {
   DbusCaller caller(bus.address(), kNames);
   caller.sendWithoutAnswer(caller.newCall("TakeInt64", "x", std::int64_t{5}));
   caller.disconnect();
@@ -374,7 +373,7 @@ TEST_F(DbusListenerTest, CarriesOutWhatAClientAskedForBeforeItWent) {
   EXPECT_THAT(record.events(), ElementsAre("accepted", "interrupted", "invalidated", "object gone"));
 }
 
-TEST_F(DbusListenerTest, AnswersACallOnceWhateverTheObjectDoes) {
+TEST_F(DbusListenerTest, AnswersACallOnlyOnce) {
   DbusCaller caller(bus.address(), kNames);
   caller.send(caller.newCall("AnswerTwice"));
   caller.send(caller.newCall("TakeInt64", "x", std::int64_t{1}));
@@ -387,7 +386,7 @@ TEST_F(DbusListenerTest, AnswersACallOnceWhateverTheObjectDoes) {
   EXPECT_THAT(errorLines(), IsEmpty());
 }
 
-TEST_F(DbusListenerTest, RefusesWhatItDoesNotHaveWithTheBusesOwnErrors) {
+TEST_F(DbusListenerTest, RefusesUnknownMethodsAndObjectsWithStandardErrors) {
   DbusCaller caller(bus.address(), kNames);
   const auto errorOf = [&](const std::string& path, const char* interface, const char* member) {
     return caller.ask(caller.newCall(kNames.name, path, interface, member)).error;
@@ -412,8 +411,8 @@ TEST_F(DbusListenerTest, TakesCallsThatNameNoInterface) {
   EXPECT_TRUE(isServed(caller));
 }
 
-TEST_F(DbusListenerTest, RefusesWhomTheDelegateTurnsAwayWithoutAskingItAgain) {
-  delegate.turnsAway = true;
+TEST_F(DbusListenerTest, RefusesARejectedClientWithoutAskingTheDelegateAgain) {
+  delegate.rejectsClients = true;
   DbusCaller caller(bus.address(), kNames);
   for (int at = 0; at < 2; ++at) {
     EXPECT_EQ(caller.ask("TakeInt64", "x", std::int64_t{1}).error, SD_BUS_ERROR_ACCESS_DENIED);
@@ -421,7 +420,7 @@ TEST_F(DbusListenerTest, RefusesWhomTheDelegateTurnsAwayWithoutAskingItAgain) {
   EXPECT_THAT(record.events(), ElementsAre("turned away"));
 }
 
-TEST_F(DbusListenerTest, DescribesItselfCompletely) {
+TEST_F(DbusListenerTest, DescribesItsMethodsForIntrospection) {
   DbusCaller caller(bus.address(), kNames);
   const DbusReceived answer = caller.ask(
       caller.newCall(kNames.name, kNames.path, "org.freedesktop.DBus.Introspectable", "Introspect"));
@@ -487,7 +486,7 @@ TEST_F(DbusListenerTest, RefusesRequestsWhoseBytesWouldPassTheBound) {
   EXPECT_TRUE(isServed(caller));
 }
 
-TEST_F(DbusListenerTest, RefusesOneClientTooManyUntilAnotherHasGone) {
+TEST_F(DbusListenerTest, RefusesAClientBeyondTheBoundUntilAnotherHasGone) {
   std::vector<std::unique_ptr<DbusCaller>> callers;
   for (std::size_t at = 0; at < DbusService::kMaxClients; ++at) {
     callers.push_back(std::make_unique<DbusCaller>(bus.address(), kNames));
@@ -514,7 +513,7 @@ TEST_F(DbusListenerTest, AnswersFromManyThreadsAtOnce) {
   for (std::size_t thread = 0; thread < kThreads; ++thread) {
     threads.emplace_back([&held, thread] {
       for (std::size_t at = thread; at < kCalls; at += kThreads) {
-        // Some are answered, some let go without.
+        // Half of them are answered, the others destroyed without an answer.
         if (at % 8 < kThreads) held[at].first(std::nullopt, Value(static_cast<std::int64_t>(at)));
         held[at] = {};
       }
@@ -541,7 +540,7 @@ TEST_F(DbusListenerTest, EndsEveryConnectionWhenTheBusGoesAndServesAgainWhenItCo
   EXPECT_THAT(errorLines(), ElementsAre(HasSubstr("D-Bus is gone: ")));
 }
 
-TEST_F(DbusListenerTest, LetsAnswersGoNowhereWhenTheBusIsGone) {
+TEST_F(DbusListenerTest, DropsAnswersWhenTheBusIsGone) {
   DbusCaller caller(bus.address(), kNames);
   caller.send(caller.newCall("Hold", "x", std::int64_t{1}));
   ASSERT_GE(sd_bus_flush(caller.bus()), 0);
@@ -567,13 +566,13 @@ TEST_F(DbusListenerTest, ShutsDownWhileTheBusDoesNotRead) {
   EXPECT_THAT(record.events(), ElementsAre("accepted", "interrupted", "invalidated", "object gone"));
 }
 
-// A bus, and nothing on it yet.
-class LonelyDbusListenerTest : public DbusListenerTest {
+// Starts a bus, but no listener.
+class StartingDbusListenerTest : public DbusListenerTest {
  protected:
   void SetUp() override { ASSERT_TRUE(bus.isRunning()) << "dbus-daemon does not run"; }
 };
 
-TEST_F(LonelyDbusListenerTest, SaysOnceThatThereIsNoBusAndServesWhenThereIsOne) {
+TEST_F(StartingDbusListenerTest, LogsOnceThatThereIsNoBusAndServesWhenThereIsOne) {
   bus.stop();
   startListener(bus.address());
   ASSERT_TRUE(waitForLines(1));
@@ -586,7 +585,7 @@ TEST_F(LonelyDbusListenerTest, SaysOnceThatThereIsNoBusAndServesWhenThereIsOne) 
   EXPECT_EQ(lines[1].text(), "serving com.example.rig on D-Bus");
 }
 
-TEST_F(LonelyDbusListenerTest, WaitsForANameThatAnotherHas) {
+TEST_F(StartingDbusListenerTest, WaitsForANameThatAnotherProcessHas) {
   auto other = std::make_unique<DbusCaller>(bus.address(), kNames);
   ASSERT_GE(sd_bus_request_name(other->bus(), kNames.name.c_str(), 0), 0);
   startListener(bus.address());
@@ -598,14 +597,14 @@ TEST_F(LonelyDbusListenerTest, WaitsForANameThatAnotherHas) {
   EXPECT_TRUE(isServed(caller));
 }
 
-TEST_F(LonelyDbusListenerTest, DoesNothingForAnAddressThatIsNone) {
+TEST_F(StartingDbusListenerTest, DoesNothingForAMalformedAddress) {
   startListener("nonsense");
   ASSERT_TRUE(waitForLines(1));
   listener->shutDown();
   EXPECT_THAT(log.textsOf("twrs"), ElementsAre(HasSubstr("no D-Bus to serve on: ")));
 }
 
-TEST_F(LonelyDbusListenerTest, LogsOnceThatTheBusDoesNotGiveItTheName) {
+TEST_F(StartingDbusListenerTest, LogsOnceThatTheBusDoesNotGiveItTheName) {
   PrivateBus strict("<policy context=\"mandatory\"><deny own=\"com.example.rig\"/></policy>");
   ASSERT_TRUE(strict.isRunning());
   startListener(strict.address());

@@ -12,7 +12,7 @@
 
 namespace tonewerk {
 
-// Values in messages, in the plainest way, for tests that are not about how they are written.
+// Write and read values in messages, for tests that do not test the encoding.
 
 inline void appendMap(sd_bus_message* message, const ValueMap& map);
 

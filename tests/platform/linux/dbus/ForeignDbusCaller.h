@@ -20,20 +20,20 @@
 
 namespace tonewerk {
 
-// A program of a machine with the other byte order on the bus, as there are some behind emulators and
-// tunnels: what it says is written by hand, since no library here writes it.
+// Calls the service as a program of a machine with the other byte order, such as one behind an emulator or a
+// tunnel. It writes its messages itself, because the library writes only this machine's order.
 class ForeignDbusCaller {
  public:
   static constexpr std::endian kOrder =
       std::endian::native == std::endian::little ? std::endian::big : std::endian::little;
 
-  // What a call was answered with, in this machine's order.
+  // The answer to a call, in this machine's byte order.
   struct Answer {
     std::string error;  // its name; empty without
     std::string signature;
     std::string body;
 
-    // What the body begins with.
+    // Read the first value of the body.
     template <typename T>
     T number() const {
       T value{};
@@ -47,7 +47,7 @@ class ForeignDbusCaller {
     }
   };
 
-  // `address` is that of a bus with a path.
+  // `address` is the address of a bus with a path.
   ForeignDbusCaller(const std::string& address, DbusNames names) : names_(std::move(names)) {
     const auto path = unixAddressOf(address.substr(address.find('/')));
     socket_.reset(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
@@ -63,7 +63,7 @@ class ForeignDbusCaller {
     return ask(names_, member, signature, body);
   }
   Answer ask(const std::string& member) { return ask(member, "", body()); }
-  // Waits for nothing, and passes the answer over.
+  // Does not wait. The answer is skipped.
   void send(const std::string& member, std::string_view signature, const DbusBytes& body) {
     write(callTo(names_, member, signature, body));
   }
@@ -79,7 +79,7 @@ class ForeignDbusCaller {
     for (;;) {
       const std::string header = read(kFixedBytes);
       if (header.size() < kFixedBytes) return {};
-      // What answers is of this machine.
+      // The answers come from programs of this machine.
       EXPECT_EQ(header[0], std::endian::native == std::endian::little ? 'l' : 'B');
       const std::string fields = read((numberAt(header, 12) + 7) / 8 * 8);
       Answer answer = answerOf(fields, serial);
@@ -94,7 +94,8 @@ class ForeignDbusCaller {
                       true);
   }
 
-  // Reads a header's fields; what is no answer to `serial`, such as a signal, is passed over.
+  // Reads a header's fields. Sets isAnswer_ when the message answers `serial`; others, such as signals, are
+  // skipped.
   Answer answerOf(const std::string& fields, std::uint32_t serial) {
     Answer answer;
     isAnswer_ = false;
@@ -145,7 +146,7 @@ class ForeignDbusCaller {
     EXPECT_EQ(::send(socket_.get(), bytes.data(), bytes.size(), MSG_NOSIGNAL),
               static_cast<ssize_t>(bytes.size()));
   }
-  // A test failure, and fewer bytes, when they do not come.
+  // Reads `size` bytes. Fails the test and returns fewer when they do not come.
   std::string read(std::size_t size) const {
     std::string bytes;
     while (bytes.size() < size) {

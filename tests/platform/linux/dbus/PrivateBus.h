@@ -14,7 +14,7 @@
 
 namespace tonewerk {
 
-// A D-Bus of the test's own, with a real dbus-daemon. Runs from the start.
+// Runs a real dbus-daemon for the test. The constructor starts it.
 class PrivateBus {
  public:
   // `elements` are added to its configuration.
@@ -23,7 +23,7 @@ class PrivateBus {
         << "<busconfig><type>session</type><listen>unix:path=" << directory_.path("bus")
         << "</listen><auth>EXTERNAL</auth><policy context=\"default\"><allow send_destination=\"*\"/>"
            "<allow eavesdrop=\"true\"/><allow own=\"*\"/></policy>"
-           // As session buses have them.
+           // The same limits as on session buses.
            "<limit name=\"max_replies_per_connection\">50000</limit>"
            "<limit name=\"max_connections_per_user\">100000</limit>"
         << elements << "</busconfig>";
@@ -57,11 +57,11 @@ class PrivateBus {
     isRunning_ = false;
     unlink(directory_.path("bus").c_str());
   }
-  // From now on it does nothing, until stop().
+  // Suspends the daemon until stop().
   void freeze() const { kill(process_, SIGSTOP); }
 
  private:
-  // In the child, between fork and exec: only what is safe there.
+  // Runs in the child between fork and exec, where only async-signal-safe calls are allowed.
   [[noreturn]] static void become(const char* configuration, const char* report) {
     prctl(PR_SET_PDEATHSIG, SIGKILL);
     execlp("dbus-daemon", "dbus-daemon", "--nofork", configuration, report, nullptr);

@@ -18,7 +18,7 @@ Directories directoriesOf(const std::map<std::string, std::string>& variables, u
   return Directories::from(environment, user);
 }
 
-TEST(DirectoriesTest, AServiceManagersVariablesSayItAll) {
+TEST(DirectoriesTest, AServiceManagersVariablesComeFirst) {
   const std::map<std::string, std::string> variables = {{"RUNTIME_DIRECTORY", "/r"},
                                                         {"STATE_DIRECTORY", "/s"},
                                                         {"LOGS_DIRECTORY", "/l"},
@@ -42,13 +42,13 @@ TEST(DirectoriesTest, AUsersBaseDirectoriesComeNext) {
   EXPECT_EQ(directoriesOf(variables, kRoot), expected);
 }
 
-TEST(DirectoriesTest, AUserWithoutVariablesLivesBelowHome) {
+TEST(DirectoriesTest, AUserWithoutVariablesUsesDirectoriesBelowHome) {
   const Directories expected{"/run/user/1000/tonewerk", "/home/u/.local/state/tonewerk",
                              "/home/u/.local/state/tonewerk/logs", "/home/u/.config/tonewerk"};
   EXPECT_EQ(directoriesOf({{"HOME", "/home/u"}}, kUser), expected);
 }
 
-TEST(DirectoriesTest, RootWithoutVariablesIsTheSystem) {
+TEST(DirectoriesTest, RootWithoutVariablesUsesTheSystemsDirectories) {
   EXPECT_EQ(directoriesOf({{"HOME", "/root"}}, kRoot), Directories::system());
   EXPECT_EQ(Directories::system().logs, "/var/log/tonewerk");
 }
@@ -57,7 +57,7 @@ TEST(DirectoriesTest, LogsFollowAStateDirectoryThatRootChose) {
   EXPECT_EQ(directoriesOf({{"STATE_DIRECTORY", "/tmp/demo"}}, kRoot).logs, "/tmp/demo/logs");
 }
 
-TEST(DirectoriesTest, EmptyAndRelativeBaseDirectoriesAreAsIfNotSet) {
+TEST(DirectoriesTest, EmptyAndRelativeBaseDirectoriesCountAsNotSet) {
   const Directories chosen =
       directoriesOf({{"HOME", "/h"}, {"XDG_STATE_HOME", ""}, {"XDG_CONFIG_HOME", "relative"}}, kUser);
   EXPECT_EQ(chosen.state, "/h/.local/state/tonewerk");

@@ -22,7 +22,7 @@ std::string streamOf(int fileDescriptor) {
   return std::to_string(status.st_dev) + ":" + std::to_string(status.st_ino);
 }
 
-// Sets a variable for the test's length.
+// Sets an environment variable while it exists.
 class ScopedVariable {
  public:
   ScopedVariable(const char* name, const std::string& value) : name_(name) { setenv(name, value.c_str(), 1); }
@@ -34,7 +34,7 @@ class ScopedVariable {
   const char* name_;
 };
 
-TEST(JournalLogTest, AnEntryCarriesWhatToSearchBy) {
+TEST(JournalLogTest, AnEntryHasTheFieldsToSearchBy) {
   EXPECT_THAT(JournalLog::fields("com.orvane.tonewerk", "twrr", LogLevel::kError, "a\nb=c"),
               IsSupersetOf({"MESSAGE=a\nb=c", "PRIORITY=3", "TONEWERK_SUBSYSTEM=com.orvane.tonewerk",
                             "TONEWERK_CATEGORY=twrr", "TONEWERK_LEVEL=error"}));
@@ -48,7 +48,7 @@ TEST(JournalLogTest, LevelsBecomeTheSystemsPriorities) {
   EXPECT_EQ(priorityOf(LogLevel::kError), "PRIORITY=3");
 }
 
-TEST(JournalLogTest, TheJournalIsKnownByDeviceAndInode) {
+TEST(JournalLogTest, TheJournalIsRecognisedByDeviceAndInode) {
   const std::string stream = streamOf(STDERR_FILENO);
   EXPECT_TRUE(JournalLog::isJournal(stream, STDERR_FILENO));
   EXPECT_FALSE(JournalLog::isJournal(stream + "1", STDERR_FILENO));
@@ -74,7 +74,7 @@ TEST(StandardLogTest, TakesItsThresholdFromTheEnvironment) {
   EXPECT_FALSE(log->isEnabled("twrs", LogLevel::kDefault));
 }
 
-TEST(StandardLogTest, SaysSoWhenTheEnvironmentMakesNoSense) {
+TEST(StandardLogTest, LogsAThresholdThatCannotBeParsed) {
   const ManualClock clock;
   const ScopedVariable wanted("TONEWERK_LOG", "loud");
   testing::internal::CaptureStderr();

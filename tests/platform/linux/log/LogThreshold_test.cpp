@@ -30,24 +30,24 @@ TEST(LogThresholdTest, ALevelHoldsForEveryCategory) {
   EXPECT_EQ(levelOf(parsed("error"), "twrs"), LogLevel::kError);
 }
 
-TEST(LogThresholdTest, AListSetsCategoriesApart) {
+TEST(LogThresholdTest, AListSetsSingleCategories) {
   const LogThreshold threshold = parsed("twrr=debug, twrs=error ,info");
   EXPECT_EQ(levelOf(threshold, "twrr"), LogLevel::kDebug);
   EXPECT_EQ(levelOf(threshold, "twrs"), LogLevel::kError);
   EXPECT_EQ(levelOf(threshold, "twrc"), LogLevel::kInfo);
 }
 
-TEST(LogThresholdTest, WithoutALevelForAllTheOthersStayAtDefault) {
+TEST(LogThresholdTest, OtherCategoriesStayAtDefault) {
   EXPECT_EQ(levelOf(parsed("twrr=debug"), "twrs"), LogLevel::kDefault);
 }
 
-TEST(LogThresholdTest, WhatComesLaterWins) {
+TEST(LogThresholdTest, TheLastLevelCounts) {
   const LogThreshold threshold = parsed("debug,twrr=error,twrr=info,error");
   EXPECT_EQ(levelOf(threshold, "twrr"), LogLevel::kInfo);
   EXPECT_EQ(levelOf(threshold, "twrs"), LogLevel::kError);
 }
 
-TEST(LogThresholdTest, NonsenseIsRefusedAndNamed) {
+TEST(LogThresholdTest, RefusesAMalformedTextAndNamesIt) {
   for (const char* text : {"", "verbose", "DEBUG", "twrr=", "=debug", "twrr=debug,", "twrr:debug", "3"}) {
     std::string problem;
     EXPECT_FALSE(LogThreshold::parse(text, problem)) << text;

@@ -42,7 +42,7 @@ TEST(RecentLinesTest, CutsLongLinesBetweenCharacters) {
   EXPECT_EQ(lines.text(), "abc\n");
 }
 
-TEST(RememberingLogTest, ALineIsTextWhateverItQuotes) {
+TEST(RememberingLogTest, MakesEveryLineValidUtf8) {
   ManualClock clock;
   auto inner = std::make_unique<MemoryLog>();
   const MemoryLog& written = *inner;
@@ -53,7 +53,7 @@ TEST(RememberingLogTest, ALineIsTextWhateverItQuotes) {
   EXPECT_TRUE(lines->text().ends_with("a tool said \uFFFD\n"));
 }
 
-TEST(RememberingLogTest, KeepsWhatItPassesOn) {
+TEST(RememberingLogTest, KeepsTheLinesThatItPassesOn) {
   ManualClock clock;
   auto inner = std::make_unique<MemoryLog>();
   MemoryLog& written = *inner;

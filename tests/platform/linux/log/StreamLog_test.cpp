@@ -28,7 +28,7 @@ class Pipe {
     writer_.reset(ends[1]);
   }
   int writer() const { return writer_.get(); }
-  // What was written until now, which is at most a pipe's capacity; closes the writing end.
+  // Closes the writing end and reads what was written before, which is at most a pipe's capacity.
   std::string readAll() {
     writer_.reset();
     std::string text;
@@ -58,7 +58,7 @@ TEST(StreamLogTest, TheTimeAlwaysHasSixDigits) {
             "1969-12-31T23:59:59.500000Z error twrs x\n");
 }
 
-TEST(StreamLogTest, AMessageWithNewlinesIsWrittenAsItIs) {
+TEST(StreamLogTest, AMessageWithNewlinesIsWrittenUnchanged) {
   Pipe pipe;
   const ManualClock clock(kTime);
   StreamLog(pipe.writer(), clock).write("com.orvane.tonewerk", "twrr", LogLevel::kError, "a\nb");

@@ -20,12 +20,12 @@ using Result = RpcFrameReader::Result;
 // "m" as a method.
 constexpr const char* kRequestOfM = "94 00 01 A1 6D ";
 
-// A request of "m" with these arguments, which bring their own header.
+// A request of "m" with these arguments, which include the header of their array.
 std::string requestWith(std::string_view arguments) { return fromHex(kRequestOfM) + fromHex(arguments); }
 
 class RpcFrameReaderTest : public testing::Test {
  protected:
-  // The frame of `bytes`, all of which it must take.
+  // Reads `bytes` as one frame and expects that all of them are used.
   RpcFrame read(std::string_view bytes) {
     EXPECT_EQ(reader.next(bytes), Result::kFrame) << reader.problem();
     RpcFrame frame = reader.frame();
@@ -86,7 +86,7 @@ TEST_F(RpcFrameReaderTest, ReadsResponses) {
   EXPECT_FALSE(error.result);
 }
 
-TEST_F(RpcFrameReaderTest, AcceptsLongFormsOfShortThings) {
+TEST_F(RpcFrameReaderTest, AcceptsLongFormsOfShortValues) {
   const RpcFrame frame =
       read(fromHex("DD 00000004 D3 0000000000000000 CF 0000000000000001 DB 00000001 6D DC 0000"));
   EXPECT_EQ(frame.kind, RpcFrame::Kind::kRequest);
@@ -126,7 +126,7 @@ TEST_F(RpcFrameReaderTest, ReadsDates) {
   EXPECT_EQ(frame.arguments, (Arguments{Value(Date{10.0}), Value(Date{1.5}), Value(Date{-0.5})}));
 }
 
-TEST_F(RpcFrameReaderTest, LetsTheLastOfEqualKeysWinInTheFirstOnesPlace) {
+TEST_F(RpcFrameReaderTest, KeepsTheLastOfEqualKeysAtTheFirstOnesPosition) {
   const RpcFrame frame = read(requestWith("91 83 A1 61 01 A1 62 02 A1 61 03"));
   ASSERT_TRUE(frame.arguments[0]->asMap());
   EXPECT_EQ(*frame.arguments[0]->asMap(), (ValueMap{{"a", 3}, {"b", 2}}));
@@ -172,7 +172,7 @@ TEST_F(RpcFrameReaderTest, ReadsManyFramesFromOnePiece) {
   EXPECT_EQ(reader.next(bytes), Result::kNeedsMore);
 }
 
-TEST_F(RpcFrameReaderTest, GoesOnAfterALongFrame) {
+TEST_F(RpcFrameReaderTest, ReadsTheFrameAfterALongOne) {
   const std::string frames = requestOfSize(500'000) + requestOfSize(200'000) + requestWith("91 05");
   std::string_view bytes = frames;
   ASSERT_EQ(reader.next(bytes), Result::kFrame);
@@ -198,7 +198,7 @@ TEST_F(RpcFrameReaderTest, TakesAFrameOfOneMebibyteAndNoneLonger) {
   EXPECT_EQ(reader.problem(), "a frame that is too long");
 }
 
-TEST_F(RpcFrameReaderTest, GivesUpOnAFrameAsSoonAsItIsTooLong) {
+TEST_F(RpcFrameReaderTest, RefusesAFrameAsSoonAsItIsTooLong) {
   const std::string endless = requestWith("91 DB FFFFFFFF") + std::string(kMaxFrameBytes, 'x');
   EXPECT_EQ(resultOf(endless), Result::kBroken);
 }
@@ -224,7 +224,7 @@ class MalformedFrameTest : public testing::TestWithParam<Malformed> {};
 TEST_P(MalformedFrameTest, IsBroken) {
   RpcStrings texts;
   RpcFrameReader reader(texts);
-  // A good frame before it must not make it any better.
+  // A valid frame before it must not make a difference.
   const std::string good = requestWith("91 01");
   std::string_view before = good;
   ASSERT_EQ(reader.next(before), Result::kFrame);
@@ -320,7 +320,7 @@ INSTANTIATE_TEST_SUITE_P(
                     Refused{"FirstOfTwo", "92 C0 C4 00", "holds nil"}),
     [](const auto& tested) { return tested.param.name; });
 
-// Some of what a daemon answers comes from elsewhere than its clients, such as a process's name.
+// Some texts in a daemon's answers do not come from its clients, such as a process's name.
 TEST_F(RpcFrameReaderTest, TakesNoncharactersInAnswers) {
   const std::string frame = fromHex("94 01 07 C0 81 A3 EFBFBF A3 EFB790");
   std::string_view bytes = frame;
@@ -337,16 +337,16 @@ TEST_F(RpcFrameReaderTest, RefusesMoreArgumentsThanAnyMethodTakes) {
   EXPECT_THAT(frame.arguments, SizeIs(16));
 }
 
-TEST_F(RpcFrameReaderTest, KeepsOnlySoManyOfAFloodOfArguments) {
+TEST_F(RpcFrameReaderTest, KeepsAFewOfVeryManyArguments) {
   const std::string flood = requestWith("DD 000F0000") + std::string(0xF0000, '\xC0');
   const RpcFrame frame = read(flood);
   EXPECT_TRUE(frame.refused);
   EXPECT_LE(frame.arguments.capacity(), 16U);
 }
 
-TEST_F(RpcFrameReaderTest, MakesNoRoomForWhatAHeaderClaims) {
-  // Thirty arrays inside each other that claim four thousand million elements each; ASan would not allow the
-  // room.
+TEST_F(RpcFrameReaderTest, AllocatesNothingForTheCountInAHeader) {
+  // Thirty nested arrays that each announce four thousand million elements. AddressSanitizer would refuse
+  // such an allocation.
   std::string frame = fromHex(kRequestOfM) + fromHex("DD FFFFFFFF");
   for (int depth = 0; depth < 15; ++depth) frame += fromHex("DD FFFFFFFF DF FFFFFFFF A1 61");
   EXPECT_EQ(resultOf(frame), Result::kNeedsMore);

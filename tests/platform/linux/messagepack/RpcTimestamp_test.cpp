@@ -58,7 +58,7 @@ TEST(RpcTimestampTest, CarriesAFractionThatRoundsUpIntoTheSeconds) {
   EXPECT_EQ(timestampOf(Date{0.9999999999}), fromHex("00000001"));
 }
 
-TEST(RpcTimestampTest, WritesTheNearestDateThereIsForWhatItCannotSay) {
+TEST(RpcTimestampTest, WritesTheNearestDateThatFits) {
   constexpr double kInfinity = std::numeric_limits<double>::infinity();
   EXPECT_EQ(timestampOf(Date{kInfinity}), fromHex("00000000 7FFFFFFFFFFFFFFF"));
   EXPECT_EQ(timestampOf(Date{-kInfinity}), fromHex("00000000 8000000000000000"));

@@ -41,14 +41,14 @@ TEST(RpcValueReaderTest, ReadsWhatTheWriterWrites) {
   }
 }
 
-TEST(RpcValueReaderTest, ReadsNoneOutOfNilAndOutOfNothing) {
+TEST(RpcValueReaderTest, ReadsNilAndNoBytesAsNone) {
   for (const ValuePlace place : kPlaces) {
     EXPECT_FALSE(readValue(fromHex("C0"), place));
     EXPECT_FALSE(readValue("", place));
   }
 }
 
-TEST(RpcValueReaderTest, ReadsNoneOutOfLessOrMoreThanOneValue) {
+TEST(RpcValueReaderTest, ReadsLessOrMoreThanOneValueAsNone) {
   const std::string bytes = bytesOf(ValueMap{{"a", ValueArray{1, "two"}}});
   for (const ValuePlace place : kPlaces) {
     for (std::size_t size = 0; size < bytes.size(); ++size)
@@ -58,16 +58,16 @@ TEST(RpcValueReaderTest, ReadsNoneOutOfLessOrMoreThanOneValue) {
   }
 }
 
-TEST(RpcValueReaderTest, RefusesWhatTheProtocolDoesNotCarry) {
-  // Binary data, another extension, a date of another length, a map's key that is none, nil in an array,
-  // bytes that are no UTF-8, a reserved byte, and an extension of an impossible length.
+TEST(RpcValueReaderTest, RefusesValuesOutsideTheProtocol) {
+  // Binary data, another extension, a date of another length, a map's key that is not a text, nil in an
+  // array, bytes that are not UTF-8, a reserved byte, and an extension of an impossible length.
   for (const char* hex : {"C4 01 00", "D4 05 00", "D4 FF 00", "81 01 01", "91 C0", "A1 FF", "81 A1 FF 01",
                           "C1", "C9 FFFFFFFF FF 00"}) {
     for (const ValuePlace place : kPlaces) EXPECT_FALSE(readValue(fromHex(hex), place)) << hex;
   }
 }
 
-TEST(RpcValueReaderTest, TakesANoncharacterOfAResultAlone) {
+TEST(RpcValueReaderTest, TakesANoncharacterInAResultOnly) {
   const std::string bytes = fromHex("A3 EFBFBF");
   EXPECT_FALSE(readValue(bytes, ValuePlace::kArgument));
   EXPECT_TRUE(readValue(bytes, ValuePlace::kResult));

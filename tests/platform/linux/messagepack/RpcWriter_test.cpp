@@ -27,7 +27,7 @@ TEST(RpcWriterTest, WritesRequestsAndNotifications) {
   EXPECT_EQ(out, fromHex("93 02 A1 6D 90"));
 }
 
-TEST(RpcWriterTest, AppendsToWhatIsThere) {
+TEST(RpcWriterTest, AppendsToTheBuffer) {
   std::string out = "x";
   RpcWriter(out).notification("m", {});
   EXPECT_EQ(out, "x" + fromHex("93 02 A1 6D 90"));
@@ -101,7 +101,7 @@ Value nested(std::size_t depth) {
   return value;
 }
 
-TEST(RpcWriterTest, KnowsHowDeepAFrameMayBe) {
+TEST(RpcWriterTest, ChecksTheDepthOfAFrame) {
   // The frame's own array and that of the arguments are the first two.
   EXPECT_TRUE(fitsFrameDepth({Value(1), nested(kMaxFrameDepth - 2)}));
   EXPECT_FALSE(fitsFrameDepth({Value(1), nested(kMaxFrameDepth - 1)}));

@@ -16,13 +16,13 @@ TEST(StringInternerTest, SharesATextThatComesAgain) {
   EXPECT_TRUE(first->sharesStorageWith(*second));
 }
 
-TEST(StringInternerTest, KeepsTextsUpToItsLengthAndNoneLonger) {
+TEST(StringInternerTest, KeepsTextsUpToItsMaximumLength) {
   StringInterner cache(16, 8);
   EXPECT_TRUE(cache.find("12345678")->sharesStorageWith(*cache.find("12345678")));
   EXPECT_FALSE(cache.find("123456789")->sharesStorageWith(*cache.find("123456789")));
 }
 
-TEST(StringInternerTest, StillFindsTheRightTextWhenPlacesAreFought) {
+TEST(StringInternerTest, FindsTheRightTextWhenTextsShareASlot) {
   StringInterner cache(1, 8);
   EXPECT_EQ(*cache.find("a"), "a");
   EXPECT_EQ(*cache.find("b"), "b");
@@ -37,7 +37,7 @@ TEST(StringInternerTest, FindsTheRightTextsInEveryOrder) {
   }
 }
 
-TEST(StringInternerTest, RefusesWhatIsNotUtf8WhateverItsLength) {
+TEST(StringInternerTest, RefusesTextsOfAnyLengthThatAreNotUtf8) {
   StringInterner cache(16, 8);
   EXPECT_FALSE(cache.find("\xFF"));
   EXPECT_FALSE(cache.find("\xFF"));

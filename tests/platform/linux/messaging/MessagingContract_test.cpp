@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What every messaging listener does, run on those over sockets and over D-Bus and on their double in memory.
+// Tests that every messaging listener must pass: over sockets, over D-Bus, and the fake in memory.
 #include <gmock/gmock.h>
 #include <map>
 #include <string>
@@ -27,7 +27,7 @@ namespace {
 using testing::ElementsAre;
 using testing::SizeIs;
 
-// What a side says of wrong requests; only D-Bus has its own words, since it knows methods by other names.
+// The error texts of a side. D-Bus has its own, because it uses other method names.
 struct PlainTexts {
   static constexpr const char* kUnknownMethod = "unknown method noSuchMethod";
   static constexpr const char* kWrongType = "takeTwo: argument 2 (number) must be a signed 64-bit integer";
@@ -59,7 +59,7 @@ class MemorySide {
   }
   void disconnect() { client_->disconnect(); }
   void shutDown() { messaging_.shutDown(); }
-  // Whether the client has been let in and not been sent away.
+  // True while the client is accepted and connected.
   bool isServed() { return client_ != nullptr && !client_->hasEnded(); }
 
  private:
@@ -129,7 +129,7 @@ class DbusSide {
   }
   static std::int32_t clientProcess() { return ::getpid(); }
   static std::uint32_t clientUser() { return ::getuid(); }
-  // A client is known by its first request; this one is wrong and not answered.
+  // The listener learns of a client by its first request. This one has wrong arguments and wants no answer.
   void connect() {
     waitForName();
     caller_ = std::make_unique<DbusCaller>(bus_.address(), kNames);
@@ -216,14 +216,14 @@ class MessagingContractTest : public testing::Test {
 using Sides = testing::Types<MemorySide, SocketSide, DbusSide>;
 TYPED_TEST_SUITE(MessagingContractTest, Sides);
 
-TYPED_TEST(MessagingContractTest, TellsTheDelegateWhoConnects) {
+TYPED_TEST(MessagingContractTest, TellsTheDelegateTheClientsProcessAndUser) {
   this->side.connect();
   ASSERT_TRUE(this->record.waitForEvents(1));
   EXPECT_EQ(this->delegate.lastProcessIdentifier, TypeParam::clientProcess());
   EXPECT_EQ(this->delegate.lastUserIdentifier, TypeParam::clientUser());
 }
 
-TYPED_TEST(MessagingContractTest, LetsItsOwnUserCallWhatIsForTheOwnerWhereThatIsKnown) {
+TYPED_TEST(MessagingContractTest, LetsItsOwnUserCallTheOwnersMethodsIfItHasThem) {
   this->side.connect();
   this->side.request("takeFromOwner", {Value(1)});
   const std::vector<Answer> answers = this->side.answers(1);
@@ -232,8 +232,8 @@ TYPED_TEST(MessagingContractTest, LetsItsOwnUserCallWhatIsForTheOwnerWhereThatIs
   EXPECT_THAT(this->record.requests(), SizeIs(TypeParam::kKnowsOwnersMethods ? 1 : 0));
 }
 
-TYPED_TEST(MessagingContractTest, DoesNotServeWhomTheDelegateTurnsAway) {
-  this->delegate.turnsAway = true;
+TYPED_TEST(MessagingContractTest, DoesNotServeAClientThatTheDelegateRejects) {
+  this->delegate.rejectsClients = true;
   this->side.connect();
   ASSERT_TRUE(this->record.waitForEvents(1));
   EXPECT_FALSE(this->side.isServed());
@@ -253,7 +253,7 @@ TYPED_TEST(MessagingContractTest, HandsRequestsOverInOrder) {
   EXPECT_THAT(numbers, ElementsAre(1, 2, 3));
 }
 
-TYPED_TEST(MessagingContractTest, CarriesEveryKindOfValueThereAndBack) {
+TYPED_TEST(MessagingContractTest, CarriesEveryKindOfValueInBothDirections) {
   const ValueMap map{{"boolean", true},
                      {"negative", -5},
                      {"large", std::uint64_t{18446744073709551615U}},
@@ -296,7 +296,7 @@ TYPED_TEST(MessagingContractTest, AnswersWithTheObjectsOwnError) {
   EXPECT_FALSE(answers[0].result);
 }
 
-TYPED_TEST(MessagingContractTest, RefusesAMethodNobodyKnowsAndLivesOn) {
+TYPED_TEST(MessagingContractTest, RefusesAnUnknownMethodAndStaysConnected) {
   this->side.connect();
   this->side.request("noSuchMethod", {Value(1)});
   this->side.request("takeInt64", {Value(1)});
@@ -306,7 +306,7 @@ TYPED_TEST(MessagingContractTest, RefusesAMethodNobodyKnowsAndLivesOn) {
   EXPECT_FALSE(answers[1].error);
 }
 
-TYPED_TEST(MessagingContractTest, RefusesArgumentsThatDoNotSuitAndLivesOn) {
+TYPED_TEST(MessagingContractTest, RefusesUnsuitableArgumentsAndStaysConnected) {
   this->side.connect();
   this->side.request("takeTwo", {Value(ValueMap{}), Value(1.0)});
   this->side.request("takeTwo", {Value(ValueMap{})});
@@ -333,7 +333,7 @@ TYPED_TEST(MessagingContractTest, AnswersLaterAndOutOfOrder) {
   EXPECT_EQ(answers[1].result, Value("first"));
 }
 
-TYPED_TEST(MessagingContractTest, RunsItsHandlersOnceInOrderAndThenLetsTheObjectGo) {
+TYPED_TEST(MessagingContractTest, RunsItsHandlersOnceInOrderAndThenDestroysTheObject) {
   this->side.connect();
   ASSERT_TRUE(this->record.waitForEvents(1));
   this->side.disconnect();
@@ -351,7 +351,7 @@ TYPED_TEST(MessagingContractTest, EndsEveryConnectionBeforeShuttingDownReturns) 
   EXPECT_THAT(this->record.events(), SizeIs(4));
 }
 
-TYPED_TEST(MessagingContractTest, LetsRepliesToAClientThatIsGoneGoNowhere) {
+TYPED_TEST(MessagingContractTest, DropsRepliesToAClientThatIsGone) {
   this->side.connect();
   this->side.request("hold", {Value(1)});
   ASSERT_TRUE(this->record.waitForHeld(1));
@@ -366,7 +366,7 @@ TYPED_TEST(MessagingContractTest, LetsRepliesToAClientThatIsGoneGoNowhere) {
   EXPECT_FALSE(answers[0].result);
 }
 
-TYPED_TEST(MessagingContractTest, LetsRepliesAfterShuttingDownGoNowhere) {
+TYPED_TEST(MessagingContractTest, DropsRepliesAfterShuttingDown) {
   this->side.connect();
   this->side.request("hold", {Value(1)});
   ASSERT_TRUE(this->record.waitForHeld(1));
@@ -377,7 +377,8 @@ TYPED_TEST(MessagingContractTest, LetsRepliesAfterShuttingDownGoNowhere) {
   EXPECT_THAT(this->record.events(), SizeIs(4));
 }
 
-// What every listener to other processes tells the reclaimer, of which a timer exists while there are looks.
+// Tests what each listener for other processes reports to the reclaimer, which has a timer while checks are
+// scheduled.
 template <typename Side>
 class ReclaimingContractTest : public testing::Test {
  protected:
@@ -392,8 +393,8 @@ class ReclaimingContractTest : public testing::Test {
 using SidesOfProcesses = testing::Types<SocketSide, DbusSide>;
 TYPED_TEST_SUITE(ReclaimingContractTest, SidesOfProcesses);
 
-// Many small clients leave as much behind as a large one, and none of them brought much itself.
-TYPED_TEST(ReclaimingContractTest, AsksForLooksOnceClientsHaveBroughtMuchTogether) {
+// Many small clients leave as much memory behind as a large one, although none of them sends much.
+TYPED_TEST(ReclaimingContractTest, SchedulesChecksOnceAllClientsTogetherHaveSentEnough) {
   constexpr std::size_t kClients = 5;
   const std::string text(AllocatorReclaimer::kSentBytesThreshold / kClients, 'x');
   for (std::size_t client = 1; client <= kClients; ++client) {
@@ -408,11 +409,11 @@ TYPED_TEST(ReclaimingContractTest, AsksForLooksOnceClientsHaveBroughtMuchTogethe
   EXPECT_EQ(this->timers.count(), 1U);
 }
 
-TYPED_TEST(ReclaimingContractTest, AsksForLooksAtAClientsEnd) {
+TYPED_TEST(ReclaimingContractTest, SchedulesChecksAtAClientsEnd) {
   this->memory.clientSent(AllocatorReclaimer::kSentBytesThreshold);
   this->side.connect();
   ASSERT_TRUE(this->record.waitForEvents(1));
-  this->clock.advance(100.0);  // what was asked for so far
+  this->clock.advance(100.0);  // lets the scheduled checks run
   ASSERT_EQ(this->timers.count(), 0U);
   this->side.disconnect();
   ASSERT_TRUE(this->record.waitForEvents(4));

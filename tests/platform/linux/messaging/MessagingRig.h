@@ -15,16 +15,16 @@
 
 namespace tonewerk {
 
-// Long enough for the slowest machine; no test waits so long unless it fails.
+// Long enough for the slowest machine. Only a failing test waits this long.
 inline constexpr std::chrono::seconds kPatience{30};
 
-// A request as an exported object got it.
+// A request that an exported object received.
 struct ReceivedRequest {
   std::string method;
   Arguments arguments;
 };
 
-// One method for every parameter type, and some that answer in their own way.
+// One method for every parameter type, and some that answer in special ways.
 inline const RequestSet& rigInterface() {
   constexpr Parameter kNumber{"number", ParameterType::kInt64};
   constexpr Parameter kMap{"map", ParameterType::kMap};
@@ -37,17 +37,18 @@ inline const RequestSet& rigInterface() {
           {"echo", {kMap}, kAnswer},                         // answers with the map
           {"answerTwice", {}, kAnswer},                      // 1, then 2
           {"fail", {}},                                      // an error
-          {"hold", {kNumber}, kAnswer},                      // keeps token and reply
-          {"holdReply", {kNumber}, kAnswer},                 // keeps the reply alone
-          {"holdMap", {kMap}, kAnswer},                      // keeps token and reply
-          {"holdLarge", {}, kAnswer, std::size_t{1} << 20},  // likewise; its answer may come to a MiB
-          {"takeFromOwner", {kNumber}, {}, 0, true},         // for the daemon's user alone
+          {"hold", {kNumber}, kAnswer},                      // keeps the token and the reply
+          {"holdReply", {kNumber}, kAnswer},                 // keeps the reply only
+          {"holdMap", {kMap}, kAnswer},                      // keeps the token and the reply
+          {"holdLarge", {}, kAnswer, std::size_t{1} << 20},  // keeps both; its answer may have up to 1 MiB
+          {"takeFromOwner", {kNumber}, {}, 0, true},         // for the daemon's user only
     }
   };
   return interface;
 }
 
-// What connections do and what reaches them, for a test on another thread to wait for and look at.
+// Records events and requests of connections, so that a test on another thread can wait for them and check
+// them.
 class MessagingRecord {
  public:
   void add(std::string event) {
@@ -78,7 +79,7 @@ class MessagingRecord {
     const MutexLock lock(mutex_);
     return held_.size();
   }
-  // Takes out what methods that hold have kept.
+  // Takes out the replies and tokens that the hold methods have kept.
   std::vector<std::pair<Reply, InFlightToken>> takeHeld() {
     const MutexLock lock(mutex_);
     return std::exchange(held_, {});
@@ -139,13 +140,13 @@ class RigObject final : public RequestHandler {
   MessagingRecord& record_;
 };
 
-// Accepts everybody, until told otherwise, and exports a RigObject to each.
+// Accepts every client and exports a RigObject to it, while `rejectsClients` is false.
 class RigDelegate final : public MessagingListenerDelegate {
  public:
   explicit RigDelegate(MessagingRecord& record) : record_(record) {}
 
   bool listenerShouldAcceptNewConnection(MessagingConnection& connection) override {
-    if (turnsAway) {
+    if (rejectsClients) {
       record_.add("turned away");
       return false;
     }
@@ -159,7 +160,7 @@ class RigDelegate final : public MessagingListenerDelegate {
     return true;
   }
 
-  std::atomic<bool> turnsAway = false;
+  std::atomic<bool> rejectsClients = false;
   std::atomic<std::int32_t> lastProcessIdentifier = 0;
   std::atomic<std::uint32_t> lastUserIdentifier = kNoUser;
 

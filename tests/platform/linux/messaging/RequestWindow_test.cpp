@@ -20,77 +20,77 @@ class RequestWindowTest : public testing::Test {
  protected:
   std::vector<InFlightToken> start(std::size_t count, std::size_t bytes) {
     std::vector<InFlightToken> tokens;
-    for (std::size_t at = 0; at < count; ++at) tokens.push_back(load->start(bytes));
+    for (std::size_t at = 0; at < count; ++at) tokens.push_back(window->start(bytes));
     return tokens;
   }
 
   std::shared_ptr<IoWaker> waker = std::make_shared<IoWaker>();
-  std::shared_ptr<RequestWindow> load = std::make_shared<RequestWindow>(waker, kConnection);
+  std::shared_ptr<RequestWindow> window = std::make_shared<RequestWindow>(waker, kConnection);
 };
 
 TEST_F(RequestWindowTest, HasRoomUntilTheBoundOfRequestsIsReached) {
   auto tokens = start(kMaxUnfinishedRequests - 1, 1);
-  EXPECT_TRUE(load->hasRoom(0));
-  tokens.push_back(load->start(1));
-  EXPECT_FALSE(load->hasRoom(0));
+  EXPECT_TRUE(window->hasRoom(0));
+  tokens.push_back(window->start(1));
+  EXPECT_FALSE(window->hasRoom(0));
 }
 
 TEST_F(RequestWindowTest, HasRoomUntilTheBoundOfBytesIsReached) {
   auto tokens = start(1, kMaxUnfinishedBytes - 1);
-  EXPECT_TRUE(load->hasRoom(0));
-  tokens.push_back(load->start(1));
-  EXPECT_FALSE(load->hasRoom(0));
+  EXPECT_TRUE(window->hasRoom(0));
+  tokens.push_back(window->start(1));
+  EXPECT_FALSE(window->hasRoom(0));
 }
 
 TEST_F(RequestWindowTest, CountsTheBytesOfUnreadRepliesToo) {
   const auto tokens = start(1, 1000);
-  EXPECT_TRUE(load->hasRoom(kMaxUnfinishedBytes - 1001));
-  EXPECT_FALSE(load->hasRoom(kMaxUnfinishedBytes - 1000));
+  EXPECT_TRUE(window->hasRoom(kMaxUnfinishedBytes - 1001));
+  EXPECT_FALSE(window->hasRoom(kMaxUnfinishedBytes - 1000));
 }
 
-TEST_F(RequestWindowTest, HasNoRoomForRepliesAloneEither) {
-  EXPECT_TRUE(load->hasRoom(kMaxUnfinishedBytes - 1));
-  EXPECT_FALSE(load->hasRoom(kMaxUnfinishedBytes));
+TEST_F(RequestWindowTest, HasNoRoomWhenRepliesAloneReachTheBound) {
+  EXPECT_TRUE(window->hasRoom(kMaxUnfinishedBytes - 1));
+  EXPECT_FALSE(window->hasRoom(kMaxUnfinishedBytes));
 }
 
-TEST_F(RequestWindowTest, SeesWhatHasFinishedWithoutBeingWoken) {
+TEST_F(RequestWindowTest, SeesFinishedRequestsWithoutBeingWoken) {
   auto tokens = start(kMaxUnfinishedRequests, 1);
   tokens.clear();
-  EXPECT_TRUE(load->hasRoom(0));
+  EXPECT_TRUE(window->hasRoom(0));
   EXPECT_THAT(waker->take(), IsEmpty());
 }
 
 TEST_F(RequestWindowTest, WakesTheConnectionOnceWhenHalfHasFinished) {
   auto tokens = start(kMaxUnfinishedRequests, 1);
-  ASSERT_FALSE(load->hasRoom(0));
+  ASSERT_FALSE(window->hasRoom(0));
   tokens.resize(kMaxUnfinishedRequests / 2 + 1);
   EXPECT_THAT(waker->take(), IsEmpty());
   tokens.pop_back();
   EXPECT_THAT(waker->take(), ElementsAre(kConnection));
-  EXPECT_TRUE(load->hasRoom(0));
+  EXPECT_TRUE(window->hasRoom(0));
   tokens.clear();
   EXPECT_THAT(waker->take(), IsEmpty());
 }
 
 TEST_F(RequestWindowTest, WakesTheConnectionForASingleLargeRequest) {
   auto tokens = start(1, kMaxUnfinishedBytes);
-  ASSERT_FALSE(load->hasRoom(0));
+  ASSERT_FALSE(window->hasRoom(0));
   tokens.clear();
   EXPECT_THAT(waker->take(), ElementsAre(kConnection));
-  EXPECT_TRUE(load->hasRoom(0));
+  EXPECT_TRUE(window->hasRoom(0));
 }
 
-// A finish that fell between the look at the counters and the wish to be woken once must not be lost, or the
-// connection would never be read from again.
+// A request may finish after hasRoom() has read the counters and before it asks to be woken. If that were
+// missed, the connection would never be read again.
 TEST_F(RequestWindowTest, NeverMissesTheLastFinishOnAnotherThread) {
   for (int round = 0; round < 300; ++round) {
     auto tokens = start(kMaxUnfinishedRequests, 1);
     std::thread finisher([tokens = std::move(tokens)]() mutable { tokens.clear(); });
-    const bool hadRoom = load->hasRoom(0);
+    const bool hadRoom = window->hasRoom(0);
     finisher.join();
     ASSERT_TRUE(hadRoom || !waker->take().empty());
-    ASSERT_TRUE(load->hasRoom(0));
-    static_cast<void>(waker->take());  // of this round; the next one begins without
+    ASSERT_TRUE(window->hasRoom(0));
+    static_cast<void>(waker->take());  // drops this round's wakes
   }
 }
 

@@ -17,7 +17,7 @@
 
 namespace tonewerk {
 
-// A client that sends whatever bytes it is told to.
+// Connects to the daemon's socket and sends any bytes.
 class RawClient {
  public:
   explicit RawClient(const std::string& path) : socket_(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0)) {
@@ -30,7 +30,7 @@ class RawClient {
   void shutDown(int how) { ::shutdown(socket_.get(), how); }
   void close() { socket_.reset(); }
 
-  // False when the other side is gone.
+  // False when the other side has closed the connection.
   bool send(std::string_view bytes) {
     while (!bytes.empty()) {
       const ssize_t count = ::send(socket_.get(), bytes.data(), bytes.size(), MSG_NOSIGNAL);
@@ -41,13 +41,13 @@ class RawClient {
     return true;
   }
 
-  // Sends what fits without waiting for the other side to read; how many bytes that were.
+  // Sends what the socket takes without waiting, and returns the number of bytes.
   std::size_t sendWithoutWaiting(std::string_view bytes) {
     const ssize_t count = ::send(socket_.get(), bytes.data(), bytes.size(), MSG_NOSIGNAL | MSG_DONTWAIT);
     return count < 0 ? 0 : static_cast<std::size_t>(count);
   }
 
-  // The next response; none at the connection's end, or when none comes in time.
+  // The next response. None at the end of the connection or when none comes within 30 seconds.
   [[nodiscard]] std::optional<RpcFrame> response() {
     for (;;) {
       std::string_view bytes = unread_;
@@ -58,7 +58,7 @@ class RawClient {
     }
   }
 
-  // True when the other side ends the connection; what comes before that is skipped.
+  // True when the other side ends the connection within 30 seconds. Skips the bytes before that.
   [[nodiscard]] bool waitForEnd() {
     while (receive()) {
     }

@@ -28,7 +28,7 @@ class ServerSocketTest : public testing::Test {
  protected:
   std::unique_ptr<ServerSocket> open() { return ServerSocket::open(path, problem); }
 
-  // What a daemon that was killed leaves: a socket's file on which nobody listens.
+  // Leaves what a killed daemon leaves: a socket's file on which no process listens.
   void leaveStaleSocket() const {
     const FileDescriptor dead(::socket(AF_UNIX, SOCK_STREAM, 0));
     const auto address = unixAddressOf(path);
@@ -36,7 +36,7 @@ class ServerSocketTest : public testing::Test {
     ASSERT_EQ(::listen(dead.get(), 1), 0);
   }
 
-  // What another process that locks the socket's directory has; as little can be had beside it.
+  // Locks the socket's directory as another process would: the lock belongs to a different open file.
   FileDescriptor lockOfAnother() const {
     FileDescriptor lock(::open(directory.path().c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
     EXPECT_EQ(::flock(lock.get(), LOCK_EX | LOCK_NB), 0);
@@ -48,7 +48,7 @@ class ServerSocketTest : public testing::Test {
   std::string problem;
 };
 
-TEST_F(ServerSocketTest, ListensForItsGroupAndNobodyElse) {
+TEST_F(ServerSocketTest, IsAccessibleToItsUserAndGroupOnly) {
   const auto socket = open();
   ASSERT_NE(socket, nullptr) << problem;
   EXPECT_EQ(socket->name(), path);
@@ -58,7 +58,7 @@ TEST_F(ServerSocketTest, ListensForItsGroupAndNobodyElse) {
   EXPECT_TRUE(RawClient(path).isConnected());
 }
 
-TEST_F(ServerSocketTest, HasItsModeWhateverTheMask) {
+TEST_F(ServerSocketTest, HasItsModeWithAnyUmask) {
   const mode_t before = ::umask(0777);
   const auto socket = open();
   ::umask(before);
@@ -68,7 +68,7 @@ TEST_F(ServerSocketTest, HasItsModeWhateverTheMask) {
   EXPECT_EQ(made.st_mode & 0777U, 0660U);
 }
 
-TEST_F(ServerSocketTest, MakesTheDirectoriesAboveIt) {
+TEST_F(ServerSocketTest, MakesMissingDirectories) {
   const std::string deep = directory.path("run/tonewerk/reporting.sock");
   const auto socket = ServerSocket::open(deep, problem);
   ASSERT_NE(socket, nullptr) << problem;
@@ -80,7 +80,7 @@ TEST_F(ServerSocketTest, RemovesItsFileAtTheEnd) {
   EXPECT_FALSE(std::filesystem::exists(path));
 }
 
-TEST_F(ServerSocketTest, LeavesAFileThatIsNotItsOwn) {
+TEST_F(ServerSocketTest, KeepsAFileThatIsNotItsOwn) {
   auto socket = open();
   ASSERT_NE(socket, nullptr);
   std::filesystem::rename(path, directory.path("moved"));
@@ -89,7 +89,7 @@ TEST_F(ServerSocketTest, LeavesAFileThatIsNotItsOwn) {
   EXPECT_TRUE(std::filesystem::exists(path));
 }
 
-TEST_F(ServerSocketTest, ReplacesWhatADeadDaemonLeft) {
+TEST_F(ServerSocketTest, ReplacesTheSocketOfADeadDaemon) {
   leaveStaleSocket();
   ASSERT_TRUE(std::filesystem::exists(path));
   const auto socket = open();
@@ -108,7 +108,7 @@ TEST_F(ServerSocketTest, RefusesASocketInUseAndNamesItsProcess) {
   EXPECT_TRUE(RawClient(path).isConnected());
 }
 
-TEST_F(ServerSocketTest, LeavesAFileThatIsNoSocketAlone) {
+TEST_F(ServerSocketTest, DoesNotReplaceAFileThatIsNotASocket) {
   std::ofstream(path) << "precious";
   EXPECT_EQ(open(), nullptr);
   EXPECT_EQ(problem, path + " is there and no socket");
@@ -123,7 +123,7 @@ TEST_F(ServerSocketTest, SaysWhyItCannotListen) {
   EXPECT_THAT(problem, HasSubstr("cannot make"));
 }
 
-TEST_F(ServerSocketTest, IsMadeAgainInADirectoryThatIsMadeAgain) {
+TEST_F(ServerSocketTest, IsRecreatedInARecreatedDirectory) {
   const std::string run = directory.path("run");
   const std::string inRun = run + "/reporting.sock";
   const auto socket = ServerSocket::open(inRun, problem);
@@ -144,7 +144,7 @@ TEST_F(ServerSocketTest, IsMadeAgainInADirectoryThatIsMadeAgain) {
   EXPECT_TRUE(RawClient(inRun).isConnected());
 }
 
-TEST_F(ServerSocketTest, IsNotMadeAgainWhereAnotherProcessListensByNow) {
+TEST_F(ServerSocketTest, IsNotRecreatedWhereAnotherProcessListens) {
   const auto socket = open();
   ASSERT_NE(socket, nullptr);
   std::filesystem::remove(path);
@@ -156,8 +156,8 @@ TEST_F(ServerSocketTest, IsNotMadeAgainWhereAnotherProcessListensByNow) {
   EXPECT_TRUE(others->isInPlace());
 }
 
-// Once whoever held the directory's lock held the messaging thread, too.
-TEST_F(ServerSocketTest, IsNotMadeAgainWhileAnotherProcessLocksTheDirectory) {
+// The messaging thread once waited for this lock, so that another process could block it.
+TEST_F(ServerSocketTest, IsNotRecreatedWhileAnotherProcessLocksTheDirectory) {
   const auto socket = open();
   ASSERT_NE(socket, nullptr);
   std::filesystem::remove(path);
@@ -170,7 +170,7 @@ TEST_F(ServerSocketTest, IsNotMadeAgainWhileAnotherProcessLocksTheDirectory) {
   EXPECT_NE(socket->recreate(problem), nullptr);
 }
 
-TEST_F(ServerSocketTest, LeavesItsFileToTheNextOneWhileAnotherProcessLocksTheDirectory) {
+TEST_F(ServerSocketTest, KeepsItsFileWhileAnotherProcessLocksTheDirectory) {
   auto socket = open();
   ASSERT_NE(socket, nullptr);
   FileDescriptor others = lockOfAnother();
@@ -181,7 +181,7 @@ TEST_F(ServerSocketTest, LeavesItsFileToTheNextOneWhileAnotherProcessLocksTheDir
   EXPECT_NE(open(), nullptr) << problem;
 }
 
-TEST_F(ServerSocketTest, LocksNothingToLeaveAFileThatIsNotItsOwn) {
+TEST_F(ServerSocketTest, DoesNotLockToKeepAFileThatIsNotItsOwn) {
   auto socket = open();
   ASSERT_NE(socket, nullptr);
   std::filesystem::remove(path);
@@ -196,13 +196,13 @@ TEST_F(ServerSocketTest, LocksNothingToLeaveAFileThatIsNotItsOwn) {
   EXPECT_EQ(locks, 0);
 }
 
-// Runs in a child, whose descriptors are then systemd's to arrange.
+// Arranges descriptors as systemd does. Runs in a child process.
 bool passAsSystemdDoes(int listening) {
   return ::dup2(listening, 3) == 3 && ::setenv("LISTEN_PID", std::to_string(::getpid()).c_str(), 1) == 0 &&
          ::setenv("LISTEN_FDS", "1", 1) == 0;
 }
 
-// 0 when all was as it should be.
+// Returns 0 when everything is as expected.
 int takesThePassedSocket(int listening, const std::string& path, const std::string& ownPath) {
   if (!passAsSystemdDoes(listening)) return 10;
   std::string problem;
@@ -214,16 +214,16 @@ int takesThePassedSocket(int listening, const std::string& path, const std::stri
   if (std::getenv("LISTEN_FDS") != nullptr) return 15;
   if (!socket->isInPlace()) return 17;
   std::filesystem::rename(path, path + ".away");
-  const bool isMissed = !socket->isInPlace() && socket->recreate(problem) == nullptr &&
-                        problem.find("restart twreportingd.socket") != std::string::npos;
-  if (!isMissed || std::filesystem::exists(path)) return 18;
+  const bool isNotRecreated = !socket->isInPlace() && socket->recreate(problem) == nullptr &&
+                              problem.find("restart twreportingd.socket") != std::string::npos;
+  if (!isNotRecreated || std::filesystem::exists(path)) return 18;
   std::filesystem::rename(path + ".away", path);
   socket = nullptr;
   return std::filesystem::exists(path) ? 0 : 16;
 }
 
-// 0 when a socket whose file went before it was taken counts as gone.
-int missesTheFile(int listening, const std::string& path, const std::string& ownPath) {
+// Returns 0 when a passed socket whose file was removed before is not in place.
+int isNotInPlaceWithoutItsFile(int listening, const std::string& path, const std::string& ownPath) {
   std::filesystem::remove(path);
   if (!passAsSystemdDoes(listening)) return 10;
   std::string problem;
@@ -253,8 +253,8 @@ class PassedSocketTest : public ServerSocketTest {
 
 TEST_F(PassedSocketTest, IsTakenAndKeepsItsFile) { EXPECT_EQ(statusOfChild(takesThePassedSocket), 0); }
 
-TEST_F(PassedSocketTest, IsMissedWhereItsFileWentBeforeItWasTaken) {
-  EXPECT_EQ(statusOfChild(missesTheFile), 0);
+TEST_F(PassedSocketTest, IsNotInPlaceWhenItsFileWasRemovedBefore) {
+  EXPECT_EQ(statusOfChild(isNotInPlaceWithoutItsFile), 0);
 }
 
 }  // namespace

@@ -75,7 +75,7 @@ class UnixSocketListenerTest : public testing::Test {
 
   std::vector<std::string> errorLines() const { return log.textsOf("twrs", LogLevel::kError); }
 
-  // How many of the first arguments of requests so far are numbers that count up from 0.
+  // The number of requests so far whose first arguments count up from 0.
   std::size_t countedUp() const {
     std::int64_t next = 0;
     for (const ReceivedRequest& request : record.requests()) {
@@ -102,7 +102,7 @@ struct WrongArgument {
 
 class WrongArgumentTest : public UnixSocketListenerTest, public testing::WithParamInterface<WrongArgument> {};
 
-TEST_P(WrongArgumentTest, IsAnErrorThatNamesTheArgumentAndTheConnectionLivesOn) {
+TEST_P(WrongArgumentTest, IsAnErrorThatNamesTheArgumentAndKeepsTheConnection) {
   RawClient client(path);
   const std::string method = GetParam().method;
   ASSERT_TRUE(client.send(fromHex("94 00 01") + static_cast<char>(0xA0 + method.size()) + method +
@@ -189,7 +189,7 @@ INSTANTIATE_TEST_SUITE_P(
                     RightArgument{"takeList", "91 C0"}, RightArgument{"takeList", "91 90"},
                     RightArgument{"takeList", "91 92 FF CF 7FFFFFFFFFFFFFFF"}));
 
-TEST_F(UnixSocketListenerTest, NamesAnUnknownMethodButNotAtAnyLength) {
+TEST_F(UnixSocketListenerTest, CutsTheNameOfAnUnknownMethod) {
   RawClient client(path);
   // The cut would fall into the middle of the last character.
   ASSERT_TRUE(client.send(requestOf(1, std::string(63, 'm') + "\xC3\xBC" + "mm", {})));
@@ -200,7 +200,7 @@ TEST_F(UnixSocketListenerTest, NamesAnUnknownMethodButNotAtAnyLength) {
   expectServed(client);
 }
 
-TEST_F(UnixSocketListenerTest, PrefersTheUnknownMethodToItsArguments) {
+TEST_F(UnixSocketListenerTest, ReportsTheUnknownMethodRatherThanItsArguments) {
   RawClient client(path);
   ASSERT_TRUE(client.send(fromHex("94 00 01 A1 78 91 C4 00")));
   const std::optional<RpcFrame> response = client.response();
@@ -208,13 +208,13 @@ TEST_F(UnixSocketListenerTest, PrefersTheUnknownMethodToItsArguments) {
   EXPECT_EQ(response->error->asMap()->integer("code"), kUnknownMethod);
 }
 
-// A client of a user who is neither the daemon's nor root. Root can become somebody else for a connection, on
-// one thread; anybody else is made a stranger to the daemon instead, and needs no connection of another user.
-class StrangerTest : public UnixSocketListenerTest {
+// Tests a client whose user is neither the daemon's nor root. As root, the test connects from a thread of
+// another user. As any other user, it gives the listener another owner instead.
+class OtherUserTest : public UnixSocketListenerTest {
  protected:
   void SetUp() override {
     if (::geteuid() != 0) {
-      listener = nullptr;  // lets go of the path
+      listener = nullptr;  // frees the path
       std::string problem;
       listener = std::make_unique<UnixSocketListener>(ServerSocket::open(path, problem), category, nullptr,
                                                       ::geteuid() + 1);
@@ -223,7 +223,7 @@ class StrangerTest : public UnixSocketListenerTest {
     listener->resume();
   }
 
-  std::unique_ptr<RawClient> connectAsStranger() {
+  std::unique_ptr<RawClient> connectAsOtherUser() {
     if (::geteuid() != 0) return std::make_unique<RawClient>(path);
     EXPECT_EQ(::chmod(directory.path().c_str(), 0711), 0);
     EXPECT_EQ(::chmod(path.c_str(), 0666), 0);
@@ -233,8 +233,8 @@ class StrangerTest : public UnixSocketListenerTest {
   }
 };
 
-TEST_F(StrangerTest, IsRefusedWhatIsForTheOwnerAndServedAllElse) {
-  const auto client = connectAsStranger();
+TEST_F(OtherUserTest, IsRefusedTheOwnersMethodsAndServedTheOthers) {
+  const auto client = connectAsOtherUser();
   ASSERT_TRUE(client->isConnected());
   ASSERT_TRUE(client->send(requestOf(1, "takeFromOwner", {Value(1)})));
   const std::optional<RpcFrame> response = client->response();
@@ -248,8 +248,8 @@ TEST_F(StrangerTest, IsRefusedWhatIsForTheOwnerAndServedAllElse) {
   expectServed(*client);
 }
 
-TEST_F(StrangerTest, LearnsThatItIsNotPermittedBeforeWhatIsWrongWithItsArguments) {
-  const auto client = connectAsStranger();
+TEST_F(OtherUserTest, IsNotPermittedEvenWithWrongArguments) {
+  const auto client = connectAsOtherUser();
   ASSERT_TRUE(client->isConnected());
   ASSERT_TRUE(client->send(requestOf(1, "takeFromOwner", {Value("text")})));
   const std::optional<RpcFrame> response = client->response();
@@ -257,7 +257,7 @@ TEST_F(StrangerTest, LearnsThatItIsNotPermittedBeforeWhatIsWrongWithItsArguments
   EXPECT_EQ(response->error->asMap()->integer("code"), kNotPermitted);
 }
 
-TEST_F(UnixSocketListenerTest, ServesRootWhatIsForTheOwnerWhoeverThatIs) {
+TEST_F(UnixSocketListenerTest, ServesRootTheMethodsOfAnyOwner) {
   if (::geteuid() != 0) GTEST_SKIP() << "only root can be root";
   listener = nullptr;
   std::string problem;
@@ -272,7 +272,7 @@ TEST_F(UnixSocketListenerTest, ServesRootWhatIsForTheOwnerWhoeverThatIs) {
   EXPECT_FALSE(response->error);
 }
 
-TEST_F(UnixSocketListenerTest, EndsAConnectionThatSendsNonsenseAndServesTheOthers) {
+TEST_F(UnixSocketListenerTest, EndsAConnectionThatSendsOtherBytesAndServesTheOthers) {
   RawClient good(path);
   RawClient bad(path);
   expectServed(good);
@@ -280,7 +280,7 @@ TEST_F(UnixSocketListenerTest, EndsAConnectionThatSendsNonsenseAndServesTheOther
   EXPECT_TRUE(bad.waitForEnd());
   EXPECT_THAT(errorLines(), ElementsAre(HasSubstr("something that is no array and is ended")));
   EXPECT_THAT(errorLines(), ElementsAre(HasSubstr("of process " + std::to_string(::getpid()))));
-  // What came before the nonsense has been done.
+  // The request before those bytes was carried out.
   EXPECT_EQ(record.requests().back().arguments, Arguments{Value(5)});
   expectServed(good);
 }
@@ -288,17 +288,17 @@ TEST_F(UnixSocketListenerTest, EndsAConnectionThatSendsNonsenseAndServesTheOther
 TEST_F(UnixSocketListenerTest, ServesItsClientsWhileAnotherProcessLocksTheSocketsDirectory) {
   RawClient client(path);
   expectServed(client);
-  FileDescriptor others(::open(directory.path().c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
-  ASSERT_EQ(::flock(others.get(), LOCK_EX | LOCK_NB), 0);
+  FileDescriptor otherLock(::open(directory.path().c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  ASSERT_EQ(::flock(otherLock.get(), LOCK_EX | LOCK_NB), 0);
   std::filesystem::remove(path);
   listener->restoreSocket();
-  // The second round comes after the one in which the socket was to be made again.
+  // The second answer comes after the round in which the socket was to be recreated.
   expectServed(client);
   expectServed(client);
   EXPECT_THAT(errorLines(),
               ElementsAre("clients cannot connect: " + directory.path() + " is locked by another process"));
 
-  others.reset();
+  otherLock.reset();
   listener->restoreSocket();
   expectServed(client);
   expectServed(client);
@@ -323,7 +323,7 @@ TEST_F(UnixSocketListenerTest, EndsAConnectionWhoseFrameIsTooLong) {
   EXPECT_THAT(record.requests(), IsEmpty());
 }
 
-TEST_F(UnixSocketListenerTest, LogsWhoComesAndGoesAtInfoLevel) {
+TEST_F(UnixSocketListenerTest, LogsConnectionsAndTheirEndsAtInfoLevel) {
   {
     RawClient client(path);
     expectServed(client);
@@ -348,7 +348,7 @@ TEST_F(UnixSocketListenerTest, RunsRequestsThatCameBeforeAHalfCloseAndThenEnds) 
   EXPECT_THAT(record.events(), ElementsAre("accepted", "interrupted", "invalidated", "object gone"));
 }
 
-TEST_F(UnixSocketListenerTest, SendsWhatIsAnsweredBeforeItEndsAfterAHalfClose) {
+TEST_F(UnixSocketListenerTest, SendsAnswersBeforeItEndsAfterAHalfClose) {
   RawClient client(path);
   ASSERT_TRUE(client.send(requestOf(1, "echo", {Value(ValueMap{{"a", 1}})})));
   client.shutDown(SHUT_WR);
@@ -396,7 +396,7 @@ TEST_F(UnixSocketListenerTest, ReadsNoFurtherThanTheBoundOfUnfinishedRequests) {
   for (std::size_t at = 0; at < kSent; ++at) frames += notificationOf("hold", {Value(at)});
   ASSERT_TRUE(client.send(frames));
   ASSERT_TRUE(record.waitForHeld(kMaxUnfinishedRequests));
-  // Another client's answered request shows that the thread has had its time.
+  // The answer to another client shows that the thread has read all that it will read.
   RawClient other(path);
   expectServed(other);
   EXPECT_EQ(record.heldCount(), kMaxUnfinishedRequests);
@@ -430,7 +430,7 @@ TEST_F(UnixSocketListenerTest, ReadsNoFurtherThanTheBoundOfUnfinishedBytes) {
   sender.join();
 }
 
-TEST_F(UnixSocketListenerTest, CountsWhatAnAnswerMayComeToFromTheRequestOn) {
+TEST_F(UnixSocketListenerTest, CountsTheLargestAnswerFromTheRequestOn) {
   RawClient client(path);
   std::string frames;
   for (int at = 0; at < 20; ++at) frames += notificationOf("holdLarge", {});
@@ -455,15 +455,16 @@ TEST_F(UnixSocketListenerTest, DoesNotCountARequestWhoseReplyAloneIsHeldBack) {
 }
 
 TEST_F(UnixSocketListenerTest, StopsReadingAPeerThatNeverReadsItsReplies) {
-  RawClient deaf(path);
+  RawClient unread(path);
   const std::string frame = requestOf(1, "echo", {Value(ValueMap{{"text", std::string(500'000, 'x')}})});
   std::atomic<bool> isStopping = false;
   std::thread sender([&] {
     for (std::size_t at = 0; at < 1000 && !isStopping; ++at) {
-      if (!deaf.send(frame)) break;
+      if (!unread.send(frame)) break;
     }
   });
-  // Replies beyond its bound and what two sockets hold: it is paused, and not one request more is read.
+  // Once unread replies fill the sockets and reach the bound, the connection is paused and no more requests
+  // are read.
   constexpr std::size_t kUntilPaused = kMaxUnfinishedBytes / 500'000 + 1;
   ASSERT_TRUE(record.waitForRequests(kUntilPaused));
   RawClient other(path);
@@ -471,13 +472,13 @@ TEST_F(UnixSocketListenerTest, StopsReadingAPeerThatNeverReadsItsReplies) {
   EXPECT_LE(record.requests().size(), kUntilPaused + 4);
 
   // Once it reads again it is served again.
-  for (std::size_t at = 0; at < 2 * kUntilPaused; ++at) ASSERT_TRUE(deaf.response());
+  for (std::size_t at = 0; at < 2 * kUntilPaused; ++at) ASSERT_TRUE(unread.response());
   isStopping = true;
-  deaf.shutDown(SHUT_RDWR);
+  unread.shutDown(SHUT_RDWR);
   sender.join();
 }
 
-TEST_F(UnixSocketListenerTest, EndsAPausedConnectionOnceWhatItSentHasRun) {
+TEST_F(UnixSocketListenerTest, EndsAPausedConnectionOnceItsRequestsHaveRun) {
   constexpr std::size_t kSent = kMaxUnfinishedRequests + 10;
   {
     RawClient client(path);
@@ -552,7 +553,7 @@ TEST_F(UnresumedListenerTest, ShutsDownWithoutEverHavingBeenResumed) {
   EXPECT_FALSE(RawClient(path).isConnected());
 }
 
-TEST_F(UnresumedListenerTest, ServesWhoConnectedBeforeItWasResumed) {
+TEST_F(UnresumedListenerTest, ServesAClientThatConnectedBeforeItWasResumed) {
   RawClient client(path);
   ASSERT_TRUE(client.send(requestOf(99, "takeInt64", {Value(1)})));
   EXPECT_THAT(record.events(), IsEmpty());
@@ -560,7 +561,7 @@ TEST_F(UnresumedListenerTest, ServesWhoConnectedBeforeItWasResumed) {
   EXPECT_TRUE(client.response());
 }
 
-// The kernel's limit on descriptors is lowered for the listener's life, so that it comes within reach.
+// Lowers the kernel's limit on descriptors, so that the tests can reach it.
 class FewDescriptorsTest : public testing::Test {
  protected:
   static rlimit lowered(rlim_t count) {
@@ -596,7 +597,7 @@ TEST_F(FewDescriptorsTest, LeavesHalfOfTheDescriptorsToTheDaemonAndLetsClientsWa
   ASSERT_TRUE(clients.front()->response());
   EXPECT_THAT(record.events(), SizeIs(kMax));
 
-  // Each that leaves makes room for one that waits.
+  // Each client that leaves makes room for one that waits.
   for (std::size_t at = 0; at < 5; ++at) clients[at]->close();
   ASSERT_TRUE(clients.back()->send(requestOf(1, "takeInt64", {Value(1)})));
   EXPECT_TRUE(clients.back()->response());
@@ -605,13 +606,13 @@ TEST_F(FewDescriptorsTest, LeavesHalfOfTheDescriptorsToTheDaemonAndLetsClientsWa
               ElementsAre(HasSubstr("cannot accept another client for now: too many clients")));
 }
 
-TEST_F(FewDescriptorsTest, PausesWhenTheSystemHasNoDescriptorAndSaysSoOnce) {
+TEST_F(FewDescriptorsTest, PausesWhenTheSystemHasNoDescriptorAndLogsThatOnce) {
   std::string problem;
   UnixSocketListener listener(ServerSocket::open(path, problem), category);
   listener.setDelegate(delegate);
   listener.resume();
-  // A client's whole life and an error's text beforehand: without descriptors the sanitizer cannot look at an object's
-  // type, and takes those it has not seen before for broken.
+  // One client connects and leaves first, and an error says its text: without descriptors the sanitizer cannot read an
+  // object's type, and reports types that it has not seen before.
   EXPECT_FALSE(std::generic_category().message(EMFILE).empty());
   {
     RawClient early(path);

@@ -9,14 +9,14 @@
 namespace tonewerk {
 namespace {
 
-// Counts how often a batch ended for it.
+// Counts the calls of endOfBatch().
 class Counter final : public BatchScope::Deferred {
  public:
   void endOfBatch() override { ++ends; }
   int ends = 0;
 };
 
-TEST(BatchScopeTest, PutsOffToItsEnd) {
+TEST(BatchScopeTest, RunsDeferredWorkAtItsEnd) {
   const auto counter = std::make_shared<Counter>();
   {
     BatchScope batch;
@@ -28,13 +28,13 @@ TEST(BatchScopeTest, PutsOffToItsEnd) {
   EXPECT_EQ(counter.use_count(), 1);
 }
 
-TEST(BatchScopeTest, NothingIsPutOffOutsideOfABatch) {
+TEST(BatchScopeTest, NothingIsDeferredOutsideABatch) {
   const auto counter = std::make_shared<Counter>();
   EXPECT_FALSE(BatchScope::defer(counter));
   EXPECT_EQ(counter.use_count(), 1);
 }
 
-TEST(BatchScopeTest, EndsAfterSoManyPieces) {
+TEST(BatchScopeTest, EndsAfterTheLargestNumberOfPieces) {
   const auto counter = std::make_shared<Counter>();
   BatchScope batch;
   EXPECT_TRUE(BatchScope::defer(counter));
@@ -44,7 +44,7 @@ TEST(BatchScopeTest, EndsAfterSoManyPieces) {
   EXPECT_EQ(counter->ends, 1);
 }
 
-TEST(BatchScopeTest, AnEndingMayPutOffAnother) {
+TEST(BatchScopeTest, DeferredWorkMayDeferMore) {
   class Chain final : public BatchScope::Deferred {
    public:
     explicit Chain(std::shared_ptr<Counter> next) : next_(std::move(next)) {}
@@ -63,12 +63,12 @@ TEST(BatchScopeTest, AnEndingMayPutOffAnother) {
 
 TEST(BatchScopeTest, AQueuesWorkRunsInBatches) {
   const auto counter = std::make_shared<Counter>();
-  bool isPutOff = false;
+  bool isDeferred = false;
   {
     ThreadQueue queue("test", QueuePriority::kUtility);
-    queue.async([&] { isPutOff = BatchScope::defer(counter); });
+    queue.async([&] { isDeferred = BatchScope::defer(counter); });
   }
-  EXPECT_TRUE(isPutOff);
+  EXPECT_TRUE(isDeferred);
   EXPECT_EQ(counter->ends, 1);
 }
 

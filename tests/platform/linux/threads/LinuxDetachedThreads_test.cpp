@@ -12,15 +12,15 @@
 namespace tonewerk {
 namespace {
 
-struct Seen {
+struct ObservedThread {
   std::thread::id thread;
   std::string name;
   int niceness = 0;
 };
 
-TEST(LinuxDetachedThreads, RunsWorkOnANamedThreadOfItsOwnBehindOthers) {
+TEST(LinuxDetachedThreads, RunsWorkOnItsOwnNamedThreadWithLowPriority) {
   LinuxDetachedThreads threads;
-  std::promise<Seen> promise;
+  std::promise<ObservedThread> promise;
   auto seen = promise.get_future();
   ASSERT_FALSE(threads.start("twr-some-work", [promise = std::move(promise)]() mutable {
     char name[16] = {};
@@ -28,7 +28,7 @@ TEST(LinuxDetachedThreads, RunsWorkOnANamedThreadOfItsOwnBehindOthers) {
     promise.set_value(
         {std::this_thread::get_id(), name, getpriority(PRIO_PROCESS, static_cast<id_t>(gettid()))});
   }));
-  const Seen found = seen.get();
+  const ObservedThread found = seen.get();
   EXPECT_NE(found.thread, std::this_thread::get_id());
   EXPECT_EQ(found.name, "twr-some-work");
   EXPECT_GE(found.niceness, 5);

@@ -20,7 +20,7 @@ struct Manual {
   ManualSemaphores factory{clock};
 };
 
-// What every semaphore does.
+// Tests that every semaphore must pass.
 template <typename Kind>
 class SemaphoreContract : public testing::Test {
  protected:

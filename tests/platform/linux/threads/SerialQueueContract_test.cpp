@@ -11,7 +11,7 @@
 namespace tonewerk {
 namespace {
 
-// What every serial queue does, the daemon's and the tests' own.
+// Tests that every serial queue must pass, those of the daemon and those of the tests.
 template <typename Factory>
 class SerialQueueContract : public testing::Test {
  protected:
@@ -34,7 +34,7 @@ TYPED_TEST(SerialQueueContract, RunsWorkInTheOrderInWhichItWasQueued) {
   for (int number = 0; number < 1000; ++number) EXPECT_EQ(order[static_cast<std::size_t>(number)], number);
 }
 
-TYPED_TEST(SerialQueueContract, KnowsItsOwnWork) {
+TYPED_TEST(SerialQueueContract, IsCurrentInItsOwnWorkOnly) {
   const auto queue = this->makeQueue();
   const auto other = this->makeQueue();
   bool isOwn = false;
@@ -77,7 +77,7 @@ TYPED_TEST(SerialQueueContract, DestroysWorkOnTheQueueBeforeTheNextPieceRuns) {
   EXPECT_TRUE(wasDestroyedFirst);
 }
 
-TYPED_TEST(SerialQueueContract, TakesWorkFromSeveralThreadsInEachOnesOrder) {
+TYPED_TEST(SerialQueueContract, KeepsTheOrderOfEachThreadThatQueuesWork) {
   constexpr int kThreads = 4;
   constexpr int kEach = 500;
   const auto queue = this->makeQueue();

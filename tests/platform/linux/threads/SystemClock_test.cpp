@@ -12,7 +12,7 @@ namespace {
 
 using std::chrono::minutes;
 
-// Sets the time zone for the test's length.
+// Sets the time zone while it exists.
 class ScopedTimeZone {
  public:
   explicit ScopedTimeZone(const std::string& zone) { setenv("TZ", zone.c_str(), 1); }
@@ -45,7 +45,7 @@ TEST(SystemClockTest, MonotonicTimeNeverGoesBack) {
   }
 }
 
-TEST(SystemClockTest, TheOffsetFollowsTheTimeOfYear) {
+TEST(SystemClockTest, TheOffsetFollowsSummerTime) {
   const SystemClock clock;
   const ScopedTimeZone zone("CET-1CEST,M3.5.0,M10.5.0/3");
   EXPECT_EQ(clock.utcOffset(kWinter), minutes(60));
@@ -62,7 +62,7 @@ TEST(SystemClockTest, TheOffsetFollowsTheTimeZone) {
   EXPECT_EQ(clock.utcOffset(kWinter), minutes(0));
 }
 
-TEST(SystemClockTest, ATimeBeyondAllCalendarsHasNoOffset) {
+TEST(SystemClockTest, ATimeOutsideTheCalendarHasNoOffset) {
   const SystemClock clock;
   const ScopedTimeZone zone("CET-1");
   EXPECT_EQ(clock.utcOffset(1e300), minutes(0));
@@ -70,7 +70,7 @@ TEST(SystemClockTest, ATimeBeyondAllCalendarsHasNoOffset) {
   EXPECT_EQ(clock.utcOffset(-1e16), minutes(0));
 }
 
-TEST(SystemClockTest, ASleepLastsAsLongAsItSays) {
+TEST(SystemClockTest, ASleepLastsAtLeastItsDuration) {
   SystemClock clock;
   const auto before = clock.monotonic();
   clock.sleep(std::chrono::milliseconds(20));

@@ -10,12 +10,12 @@
 namespace tonewerk {
 namespace {
 
-TEST(ThreadQueueTest, WorksWhileNobodyWaitsForIt) {
+TEST(ThreadQueueTest, RunsWorkWithoutDrain) {
   ThreadQueue queue("work", QueuePriority::kUtility);
   std::promise<void> first;
   queue.async([&] { first.set_value(); });
   first.get_future().wait();
-  // The thread has gone to sleep, or is about to; both must notice the next piece.
+  // The thread waits for work or is about to wait. In both cases it must notice the next piece of work.
   std::promise<void> second;
   queue.async([&] { second.set_value(); });
   second.get_future().wait();

@@ -20,20 +20,20 @@ struct RealTime {
   TimerThread timers;
 };
 
-// Time passes when the test waits.
+// Time passes only when the test waits.
 struct ManualTime {
   static constexpr bool kIsMovedByTheTest = true;
   ManualClock clock;
   ManualTimers timers{clock};
 };
 
-// What every timer service does.
+// Tests that every timer service must pass.
 template <typename Time>
 class TimerServiceContract : public testing::Test {
  protected:
   TimerService& timers() { return time_.timers; }
 
-  // Called from ticks: changes what the test waits for.
+  // Called from ticks. Runs `change` with the mutex held, then wakes the test.
   template <typename Change>
   void change(Change change) {
     {
@@ -43,7 +43,7 @@ class TimerServiceContract : public testing::Test {
     changed_.notifyAll();
   }
 
-  // Waits until it is true.
+  // Waits until `isTrue` returns true. Calls it with the mutex held.
   template <typename Predicate>
   void waitUntil(Predicate isTrue) {
     MutexLock lock(mutex_);
@@ -60,7 +60,7 @@ class TimerServiceContract : public testing::Test {
 
   Mutex mutex_;
   Condition changed_;
-  Time time_;  // last: its ticks use the above
+  Time time_;  // last, because its ticks use the members above
 };
 
 using Times = testing::Types<RealTime, ManualTime>;
@@ -141,7 +141,7 @@ TYPED_TEST(TimerServiceContract, AllTicksRunOnOneThread) {
   for (const std::thread::id thread : threads) EXPECT_EQ(thread, threads.front());
 }
 
-TEST(TimerThreadTest, ATimerThatOutlivesItsServiceIsSilent) {
+TEST(TimerThreadTest, ATimerThatOutlivesItsServiceDoesNotTick) {
   auto service = std::make_unique<TimerThread>();
   const auto timer = service->repeat(std::chrono::hours(1), [] { FAIL(); });
   service.reset();
@@ -162,7 +162,7 @@ TEST(ManualTimersTest, TicksRunInTheOrderOfTheirTimes) {
   EXPECT_EQ(timers.count(), 2U);
 }
 
-TEST(ManualTimersTest, TicksThatWereMissedAreNotMadeUpFor) {
+TEST(ManualTimersTest, MissedTicksAreDropped) {
   ManualClock clock;
   ManualTimers timers(clock);
   int ticks = 0;
