@@ -26,8 +26,7 @@ std::optional<std::string> serviceDirectory(const Directories::Environment& envi
   return value->empty() ? std::nullopt : value;
 }
 
-// Below a base directory that the user chose. Relative paths are ignored, as the XDG Base Directory
-// Specification requires.
+// Below a base directory that the user chose. Relative paths are ignored, as is usual for these variables.
 std::optional<std::string> userDirectory(const Directories::Environment& environment, const char* name) {
   const std::optional<std::string> base = setVariable(environment, name);
   if (!base || base->front() != '/') return std::nullopt;

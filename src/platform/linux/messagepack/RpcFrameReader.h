@@ -20,7 +20,7 @@ struct RpcStrings {
 //
 //   bytes -> next() -> kFrame      frame() is a request, a response or a notification
 //                   -> kNeedsMore  `bytes` is used up; the rest of the frame has not arrived yet
-//                   -> kBroken     not this protocol; problem() says why; final
+//                   -> kBroken     not this protocol; problem() says why, and next() never recovers
 //
 // It reads each byte a bounded number of times, whatever the frame's length and however small the pieces. The
 // length that a header announces does not determine how much is allocated. One thread.

@@ -8,7 +8,7 @@
 
 namespace tonewerk {
 
-// Where a value stands in a frame. A result may be nested one level deeper than an argument, and its texts
+// The position of a value in a frame. A result may be nested one level deeper than an argument, and its texts
 // may contain noncharacters.
 enum class ValuePlace { kArgument, kResult };
 

@@ -56,7 +56,7 @@ class AllocatorReclaimer {
   struct Checks;
 
   std::atomic<std::uint64_t> sentBytes_ = 0;
-  const std::shared_ptr<Checks> checks_;  // a tick that is running may outlive us
+  const std::shared_ptr<Checks> checks_;  // shared with a running tick, which may outlive this object
 };
 
 }  // namespace tonewerk

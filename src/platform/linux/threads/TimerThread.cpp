@@ -65,7 +65,7 @@ struct TimerThread::Schedule {
       if (entry->due > now) {
         const MonotonicTime until = entry->due;
         entry.reset();  // so that the tick is freed if its timer is destroyed meanwhile
-        changed.waitUntil(lock, until);
+        static_cast<void>(changed.waitUntil(lock, until));  // the loop looks at the time itself
         continue;
       }
       // Missed ticks are dropped: the next tick is the first one in the future.

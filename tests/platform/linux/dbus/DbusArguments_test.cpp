@@ -197,7 +197,7 @@ TEST(DbusArgumentsTest, SurvivesRandomChangesToABody) {
   for (int at = 0; at < kMessages; ++at) {
     std::string body = whole;
     for (std::size_t changes = 1 + below(3); changes > 0; --changes) {
-      // Mostly type codes and small lengths.
+      // Most of these bytes are type codes or small lengths.
       constexpr std::string_view kBytes("ybnqiuxtdsogavh(){}\0\1\2\3\4\10\20\377", 27);
       body[below(body.size())] = kBytes[below(kBytes.size())];
     }
