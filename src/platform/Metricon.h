@@ -1,24 +1,39 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <string_view>
+#include <concepts>
+#include <utility>
 
+#include "values/SharedString.h"
 #include "values/UniqueFunction.h"
 #include "values/Value.h"
 
 namespace tonewerk {
 
-// The analytics event service: records named events for whoever asked for them. Any thread.
+// What one event is called: one name, or two where a framework and a service each have a name for it.
+struct EventNames {
+  EventNames() = default;
+  // Implicit, because most events have one name.
+  template <std::convertible_to<SharedString> Name>
+  EventNames(Name&& name) : first(std::forward<Name>(name)) {}
+  EventNames(SharedString firstName, SharedString secondName)
+      : first(std::move(firstName)), second(std::move(secondName)) {}
+
+  friend bool operator==(const EventNames&, const EventNames&) = default;
+
+  SharedString first;
+  SharedString second;  // empty when the event has one name
+};
+
+// The analytics event service: records named events for consumers that asked for them. Any thread.
 class Metricon {
  public:
   virtual ~Metricon() = default;
 
-  // Whether any analytics consumer has asked for events of this name.
-  virtual bool isEventUsed(std::string_view name) = 0;
-
-  // Records an event. `payload` is called at most once, before sendEvent() returns, and only when the event
-  // is recorded. May wait while the recorder's queue is full (see docs/architecture.md, "Back pressure").
-  virtual void sendEvent(const SharedString& name, const UniqueFunction<ValueMap()>& payload) = 0;
+  // Records an event under those of its names that a consumer has asked for, the first name first. `payload` is
+  // called once, before sendEvent() returns, and not at all when nobody has asked for any of the names. May wait
+  // while the recorder's queue is full (see docs/architecture.md, "Back pressure").
+  virtual void sendEvent(const EventNames& names, const UniqueFunction<ValueMap()>& payload) = 0;
 };
 
 }  // namespace tonewerk

@@ -16,10 +16,7 @@ bool TWReportingSessionMetriconWorker::handleMessage(const TWReportingSessionMes
   const auto owner = session.lock();
   const AudioServiceType service = owner == nullptr ? kServiceGeneric : owner->serviceType();
   const auto& names = context.names().eventNames(message.category, message.type, service);
-  const UniqueFunction<ValueMap()> payload = [&message] { return message.message; };
-  for (const SharedString* name : {&names.ofTonewerk, &names.ofService}) {
-    if (metricon.isEventUsed(*name)) metricon.sendEvent(*name, payload);
-  }
+  metricon.sendEvent({names.ofTonewerk, names.ofService}, [&message] { return message.message; });
   return false;
 }
 

@@ -5,16 +5,21 @@
 
 namespace tonewerk {
 
-bool MemoryMetricon::isEventUsed(std::string_view name) {
+void MemoryMetricon::sendEvent(const EventNames& names, const UniqueFunction<ValueMap()>& payload) {
+  std::vector<std::string> used = usedOf(names);
+  if (used.empty()) return;
+  const ValueMap made = payload();
   const std::lock_guard lock(mutex_);
-  return isUsed_(name);
+  for (std::string& name : used) events_.push_back({std::move(name), made});
 }
 
-void MemoryMetricon::sendEvent(const SharedString& name, const UniqueFunction<ValueMap()>& payload) {
-  if (!isEventUsed(name)) return;
-  Event event{name.string(), payload()};
+std::vector<std::string> MemoryMetricon::usedOf(const EventNames& names) const {
   const std::lock_guard lock(mutex_);
-  events_.push_back(std::move(event));
+  std::vector<std::string> used;
+  for (const SharedString* name : {&names.first, &names.second}) {
+    if (!name->empty() && isUsed_(*name)) used.push_back(name->string());
+  }
+  return used;
 }
 
 void MemoryMetricon::useOnly(std::vector<std::string> patterns) {

@@ -21,8 +21,8 @@ class MemoryMetricon final : public Metricon {
     ValueMap payload;
   };
 
-  bool isEventUsed(std::string_view name) override;
-  void sendEvent(const SharedString& name, const UniqueFunction<ValueMap()>& payload) override;
+  // Each name that is used makes an event of its own.
+  void sendEvent(const EventNames& names, const UniqueFunction<ValueMap()>& payload) override;
 
   // From now on only events that match one of these glob patterns, or the predicate, are used.
   void useOnly(std::vector<std::string> patterns);
@@ -35,6 +35,8 @@ class MemoryMetricon final : public Metricon {
   void clear();
 
  private:
+  std::vector<std::string> usedOf(const EventNames& names) const;
+
   mutable std::mutex mutex_;  // guards all below
   std::function<bool(std::string_view name)> isUsed_ = [](std::string_view) { return true; };
   std::vector<Event> events_;

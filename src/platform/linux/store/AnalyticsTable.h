@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <array>
 #include <cstddef>
 #include <cstdint>
 #include <optional>
@@ -28,22 +27,20 @@ class AnalyticsTable {
   // Combinations of names are remembered up to this number, then anew.
   static constexpr std::size_t kMaxKnown = 4096;
 
-  struct Names {
-    std::array<SharedString, AnalyticsRow::kMaxNames> names;
-    friend bool operator==(const Names&, const Names&) = default;
-  };
   struct NamesHash {
-    std::size_t operator()(const Names& key) const { return key.names[0].hash() * 31 + key.names[1].hash(); }
+    std::size_t operator()(const EventNames& names) const {
+      return names.first.hash() * 31 + names.second.hash();
+    }
   };
 
-  std::optional<std::int64_t> nameSet(const Names& names);
-  std::optional<std::int64_t> findNameSet(const Names& names, bool& failed);
-  std::optional<std::int64_t> insertNameSet(const Names& names);
+  std::optional<std::int64_t> nameSet(const EventNames& names);
+  std::optional<std::int64_t> findNameSet(const EventNames& names, bool& failed);
+  std::optional<std::int64_t> insertNameSet(const EventNames& names);
 
   SqliteDatabase& database_;
   const JsonService& json_;
   SqliteStatement insertRow_;
-  std::unordered_map<Names, std::int64_t, NamesHash> known_;
+  std::unordered_map<EventNames, std::int64_t, NamesHash> known_;
 };
 
 }  // namespace tonewerk

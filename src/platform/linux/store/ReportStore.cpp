@@ -41,8 +41,8 @@ ReportStore::~ReportStore() {
   if (lost > 0) errorLog(log_, "rows lost that could not be written to %s: %llu", database_.path(), lost);
 }
 
-void ReportStore::recordEvent(double recordedAt, const SharedString& name, ValueMap payload) {
-  record(AnalyticsRow{recordedAt, {name, SharedString()}, std::move(payload)});
+void ReportStore::recordEvent(double recordedAt, EventNames names, ValueMap payload) {
+  record(AnalyticsRow{recordedAt, std::move(names), std::move(payload)});
 }
 
 void ReportStore::record(StoreRow row) {

@@ -48,9 +48,8 @@ class ReportStore {
   // Writes what is still to be written, if that goes well at the first try.
   ~ReportStore();
 
-  // Any thread. `recordedAt` in seconds since 1970. Two events with one payload storage recorded one right
-  // after the other share a row.
-  void recordEvent(double recordedAt, const SharedString& name, ValueMap payload);
+  // Any thread. `recordedAt` in seconds since 1970.
+  void recordEvent(double recordedAt, EventNames names, ValueMap payload);
   // Any thread. A row of any table.
   void record(StoreRow row);
 

@@ -22,21 +22,31 @@ void StoreMetricon::readConsumersAgain() {
   isStale_ = true;
 }
 
-bool StoreMetricon::isEventUsed(std::string_view name) {
+void StoreMetricon::sendEvent(const EventNames& names, const UniqueFunction<ValueMap()>& payload) {
+  EventNames used = usedOf(names);
+  if (used.first.empty()) return;
+  store_.recordEvent(clock_.now(), std::move(used), payload());
+}
+
+EventNames StoreMetricon::usedOf(const EventNames& names) {
   const std::lock_guard lock(mutex_);
   readConsumers();
-  const auto known = remembered_.find(name);
+  EventNames used;
+  if (isUsed(names.first)) used.first = names.first;
+  if (!names.second.empty() && isUsed(names.second)) {
+    (used.first.empty() ? used.first : used.second) = names.second;
+  }
+  return used;
+}
+
+bool StoreMetricon::isUsed(const SharedString& name) {
+  const auto known = remembered_.find(name.view());
   if (known != remembered_.end()) return known->second;
-  std::string text(name);
+  std::string text = name.string();
   const bool used = consumers_->wants(text);
   if (remembered_.size() >= kMaxRemembered) remembered_.clear();
   remembered_.emplace(std::move(text), used);
   return used;
-}
-
-void StoreMetricon::sendEvent(const SharedString& name, const UniqueFunction<ValueMap()>& payload) {
-  if (!isEventUsed(name)) return;
-  store_.recordEvent(clock_.now(), name, payload());
 }
 
 void StoreMetricon::readConsumers() {

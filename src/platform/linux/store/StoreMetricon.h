@@ -18,8 +18,8 @@ class LogCategory;
 class PreferenceStore;
 class ReportStore;
 
-// The analytics event service over the report store. An event that several consumers ask for is recorded
-// once.
+// The analytics event service over the report store. An event is one row, however many consumers ask for it and
+// whichever of its names they ask for.
 //
 // Who asks for what is read from the preferences, again at most once a second of the monotonic clock: a
 // change shows within a second. Entries that cannot be read are logged once, until they change, and left out.
@@ -36,9 +36,7 @@ class StoreMetricon final : public Metricon {
   // Any thread. The next event finds the preference as it is then.
   void readConsumersAgain();
 
-  bool isEventUsed(std::string_view name) override;
-  // Records nothing when nobody asks for the name.
-  void sendEvent(const SharedString& name, const UniqueFunction<ValueMap()>& payload) override;
+  void sendEvent(const EventNames& names, const UniqueFunction<ValueMap()>& payload) override;
 
  private:
   static constexpr std::chrono::seconds kReadInterval{1};
@@ -50,6 +48,9 @@ class StoreMetricon final : public Metricon {
     std::size_t operator()(std::string_view name) const { return SharedString::hashOf(name); }
   };
 
+  // Those of the names that somebody asks for; both empty when nobody does.
+  EventNames usedOf(const EventNames& names);
+  bool isUsed(const SharedString& name);
   void readConsumers();
 
   ReportStore& store_;

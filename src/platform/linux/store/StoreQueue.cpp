@@ -1,20 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/store/StoreQueue.h"
 
-#include <cmath>
 #include <utility>
 
 namespace tonewerk {
-namespace {
-
-// Two names of one message are recorded within microseconds of one another.
-constexpr double kTogetherSeconds = 0.001;
-
-}  // namespace
 
 bool StoreQueue::add(StoreRow row) {
   std::unique_lock lock(mutex_);
-  if (joinLast(row)) return false;
   const std::size_t bytes = bytesOf(row);
   bool heldUp = false;
   if (!fits(bytes) && holds_) {
@@ -115,16 +107,6 @@ std::uint64_t StoreQueue::takeDropped() {
 std::uint64_t StoreQueue::lost() const {
   const std::lock_guard lock(mutex_);
   return queued_.size() + takenRows_ + dropped_;
-}
-
-bool StoreQueue::joinLast(const StoreRow& row) {
-  const auto* event = std::get_if<AnalyticsRow>(&row);
-  auto* last = queued_.empty() ? nullptr : std::get_if<AnalyticsRow>(&queued_.back());
-  const bool joins = event != nullptr && last != nullptr && !event->names[0].empty() &&
-                     last->names[1].empty() && last->payload.sharesStorageWith(event->payload) &&
-                     std::abs(event->recordedAt - last->recordedAt) < kTogetherSeconds;
-  if (joins) last->names[1] = event->names[0];
-  return joins;
 }
 
 bool StoreQueue::fits(std::size_t bytes) const {

@@ -40,8 +40,7 @@ class StoreQueue {
 
   explicit StoreQueue(const Limits& limits) : limits_(limits) {}
 
-  // Any thread. An analytics row with one name joins the one before it when both are the same payload,
-  // recorded together. Returns true when this row begins a time of dropping because of the hold time.
+  // Any thread. Returns true when this row begins a time of dropping because of the hold time.
   bool add(StoreRow row);
 
   // Any thread. Waits until everything added before is committed; false when the first try to write that
@@ -74,7 +73,6 @@ class StoreQueue {
   std::uint64_t lost() const;
 
  private:
-  bool joinLast(const StoreRow& row);
   bool fits(std::size_t bytes) const;
   bool isUrgent() const;
 

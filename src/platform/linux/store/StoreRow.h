@@ -1,24 +1,21 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <array>
 #include <cstddef>
 #include <cstdint>
 #include <memory>
 #include <string>
 #include <variant>
 
+#include "platform/Metricon.h"
 #include "values/Value.h"
 
 namespace tonewerk {
 
-// One payload recorded under one or two analytics names. A message usually goes out under two, and costs one
-// row.
+// An analytics event: one payload under one or two names.
 struct AnalyticsRow {
-  static constexpr std::size_t kMaxNames = 2;
-
-  double recordedAt = 0.0;                      // seconds since 1970
-  std::array<SharedString, kMaxNames> names{};  // the second is empty when there is one
+  double recordedAt = 0.0;  // seconds since 1970
+  EventNames names;
   ValueMap payload;
 
   std::size_t bytes() const { return sizeof(AnalyticsRow) + payload.bytes(); }

@@ -99,7 +99,6 @@ TYPED_TEST(EnergybookContract, RecordsEventsInTheirOrder) {
   }
 }
 
-// Two analytics events with one payload become one row; two power events do not.
 TYPED_TEST(EnergybookContract, RecordsEachEventOfOnePayloadByItself) {
   const ValueMap payload{{"n", 1}};
   this->side_.energybook().sendEvent(1, "a", payload);

@@ -30,12 +30,24 @@ class StoreMetriconTest : public testing::Test {
     preferences_.configure("com.orvane.metricon", "consumers", consumers);
     clock_.advance(1.0);
   }
-  std::optional<std::int64_t> recorded(const std::string& name) {
+  // Whether an event of this name is recorded.
+  bool isUsed(const std::string& name) {
+    bool asked = false;
+    metricon_.sendEvent(name, [&] {
+      asked = true;
+      return ValueMap();
+    });
+    return asked;
+  }
+  std::optional<std::int64_t> number(const std::string& sql) {
     EXPECT_TRUE(store_.flush(std::chrono::seconds(30)));
     SqliteDatabase database;
     EXPECT_TRUE(database.open(directory_.path("reports.db"), SqliteDatabase::Mode::kReadOnly,
                               std::chrono::seconds(30)));
-    return database.number("SELECT count(*) FROM analytics_event WHERE name = '" + name + "'");
+    return database.number(sql);
+  }
+  std::optional<std::int64_t> recorded(const std::string& name) {
+    return number("SELECT count(*) FROM analytics_event WHERE name = '" + name + "'");
   }
   std::vector<std::string> errors() { return log_.textsOf("twrs", LogLevel::kError); }
 
@@ -50,50 +62,50 @@ class StoreMetriconTest : public testing::Test {
 };
 
 TEST_F(StoreMetriconTest, TakesOurEventsWithoutAnyPreference) {
-  EXPECT_TRUE(metricon_.isEventUsed("com.orvane.tonewerk.HAL_Playback.Stop"));
-  EXPECT_FALSE(metricon_.isEventUsed("org.example.Playback.Stop"));
-  EXPECT_FALSE(metricon_.isEventUsed("com.orvane"));
+  EXPECT_TRUE(isUsed("com.orvane.tonewerk.HAL_Playback.Stop"));
+  EXPECT_FALSE(isUsed("org.example.Playback.Stop"));
+  EXPECT_FALSE(isUsed("com.orvane"));
 }
 
 TEST_F(StoreMetriconTest, AsksForWhatTheConsumersAskFor) {
   configureConsumers(ValueArray{consumer("calls", {"com.orvane.telephony.*", "*.Error"}),
                                 consumer("plots", {"com.orvane.?.[AB]"})});
-  EXPECT_TRUE(metricon_.isEventUsed("com.orvane.telephony.Volume.Summary"));
-  EXPECT_TRUE(metricon_.isEventUsed("com.orvane.alarms.IO.Error"));
-  EXPECT_TRUE(metricon_.isEventUsed("com.orvane.x.B"));
-  EXPECT_FALSE(metricon_.isEventUsed("com.orvane.x.C"));
-  EXPECT_FALSE(metricon_.isEventUsed("com.orvane.alarms.IO.Stop"));
+  EXPECT_TRUE(isUsed("com.orvane.telephony.Volume.Summary"));
+  EXPECT_TRUE(isUsed("com.orvane.alarms.IO.Error"));
+  EXPECT_TRUE(isUsed("com.orvane.x.B"));
+  EXPECT_FALSE(isUsed("com.orvane.x.C"));
+  EXPECT_FALSE(isUsed("com.orvane.alarms.IO.Stop"));
   EXPECT_THAT(errors(), IsEmpty());
 }
 
 TEST_F(StoreMetriconTest, NobodyAsksWhenThereAreNoConsumers) {
   configureConsumers(ValueArray{});
-  EXPECT_FALSE(metricon_.isEventUsed("com.orvane.tonewerk.IO.Stop"));
+  EXPECT_FALSE(isUsed("com.orvane.tonewerk.IO.Stop"));
 }
 
 TEST_F(StoreMetriconTest, SeesAChangeWithinASecond) {
-  EXPECT_FALSE(metricon_.isEventUsed("org.example.x"));
+  EXPECT_FALSE(isUsed("org.example.x"));
   preferences_.configure("com.orvane.metricon", "consumers", ValueArray{consumer("c", {"org.*"})});
-  EXPECT_FALSE(metricon_.isEventUsed("org.example.x"));
+  EXPECT_FALSE(isUsed("org.example.x"));
   clock_.advance(1.0);
-  EXPECT_TRUE(metricon_.isEventUsed("org.example.x"));
-  EXPECT_FALSE(metricon_.isEventUsed("com.orvane.tonewerk.IO.Stop"));
+  EXPECT_TRUE(isUsed("org.example.x"));
+  EXPECT_FALSE(isUsed("com.orvane.tonewerk.IO.Stop"));
 }
 
 TEST_F(StoreMetriconTest, SeesAChangeAtOnceWhenItIsToldToReadAgain) {
-  EXPECT_FALSE(metricon_.isEventUsed("org.example.x"));
+  EXPECT_FALSE(isUsed("org.example.x"));
   preferences_.configure("com.orvane.metricon", "consumers", ValueArray{consumer("c", {"org.*"})});
   metricon_.readConsumersAgain();
-  EXPECT_TRUE(metricon_.isEventUsed("org.example.x"));
+  EXPECT_TRUE(isUsed("org.example.x"));
 }
 
 TEST_F(StoreMetriconTest, SaysOnceWhatItCannotRead) {
   configureConsumers(ValueArray{5, consumer("good", {"org.*", 7}), ValueMap{{"name", "empty"}},
                                 ValueMap{{"events", ValueArray{"net.*"}}}});
-  EXPECT_TRUE(metricon_.isEventUsed("org.example.x"));
-  EXPECT_FALSE(metricon_.isEventUsed("net.example.x"));
+  EXPECT_TRUE(isUsed("org.example.x"));
+  EXPECT_FALSE(isUsed("net.example.x"));
   clock_.advance(10.0);
-  EXPECT_TRUE(metricon_.isEventUsed("org.example.x"));
+  EXPECT_TRUE(isUsed("org.example.x"));
   EXPECT_THAT(errors(), ElementsAre(HasSubstr("entry 1 is no table"),
                                     HasSubstr("entry 2 (good) has a pattern that is no text: 7"),
                                     HasSubstr("entry 3 (empty) has no array of events"),
@@ -102,14 +114,14 @@ TEST_F(StoreMetriconTest, SaysOnceWhatItCannotRead) {
 
 TEST_F(StoreMetriconTest, SaysWhenTheConsumersAreNoArray) {
   configureConsumers("everybody");
-  EXPECT_FALSE(metricon_.isEventUsed("com.orvane.tonewerk.IO.Stop"));
+  EXPECT_FALSE(isUsed("com.orvane.tonewerk.IO.Stop"));
   EXPECT_THAT(errors(), ElementsAre(HasSubstr("no array of tables: everybody")));
 }
 
 TEST_F(StoreMetriconTest, StillAnswersAfterMoreNamesThanItRemembers) {
-  for (int n = 0; n < 10'000; ++n) {
-    EXPECT_TRUE(metricon_.isEventUsed("com.orvane." + std::to_string(n)));
-    EXPECT_FALSE(metricon_.isEventUsed("org." + std::to_string(n)));
+  for (int n = 0; n < 3000; ++n) {  // two names each; it remembers 4,096
+    EXPECT_TRUE(isUsed("com.orvane." + std::to_string(n)));
+    EXPECT_FALSE(isUsed("org." + std::to_string(n)));
   }
 }
 
@@ -129,6 +141,24 @@ TEST_F(StoreMetriconTest, NeitherRecordsNorMakesAPayloadNobodyAsksFor) {
   metricon_.sendEvent("com.orvane.x", [] { return ValueMap(); });
   EXPECT_EQ(recorded("org.example.x"), 0);
   EXPECT_EQ(recorded("com.orvane.x"), 1);
+}
+
+TEST_F(StoreMetriconTest, RecordsTwoNamesOfAnEventWithOnePayload) {
+  int made = 0;
+  metricon_.sendEvent({"com.orvane.x", "com.orvane.y"}, [&] { return ValueMap{{"n", ++made}}; });
+  EXPECT_EQ(made, 1);
+  EXPECT_EQ(recorded("com.orvane.x"), 1);
+  EXPECT_EQ(recorded("com.orvane.y"), 1);
+  EXPECT_EQ(number("SELECT count(*) FROM analytics_row"), 1);
+}
+
+TEST_F(StoreMetriconTest, RecordsOnlyTheNameThatSomebodyAsksFor) {
+  metricon_.sendEvent({"org.example.x", "com.orvane.x"}, [] { return ValueMap{{"n", 1}}; });
+  metricon_.sendEvent({"com.orvane.y", "org.example.y"}, [] { return ValueMap{{"n", 2}}; });
+  EXPECT_EQ(recorded("org.example.x"), 0);
+  EXPECT_EQ(recorded("com.orvane.x"), 1);
+  EXPECT_EQ(recorded("com.orvane.y"), 1);
+  EXPECT_EQ(recorded("org.example.y"), 0);
 }
 
 }  // namespace

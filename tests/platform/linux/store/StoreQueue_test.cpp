@@ -14,7 +14,7 @@ using testing::SizeIs;
 
 constexpr milliseconds kLongEnough{30'000};
 
-AnalyticsRow row(int n) { return {0.0, {SharedString("a"), SharedString()}, {{"n", n}}}; }
+AnalyticsRow row(int n) { return {0.0, "a", {{"n", n}}}; }
 
 StoreQueue::Limits small() {
   StoreQueue::Limits limits;

@@ -131,10 +131,8 @@ TEST_F(StoreReaderTest, GoesOnBehindTheLastEvent) {
 
 TEST_F(StoreReaderTest, SplitsTheTwoNamesOfARowBetweenTwoReads) {
   openStore();
-  const ValueMap payload{{"n", 1}};
   clock_.advance(1.0);
-  store_->recordEvent(clock_.now(), "first", payload);
-  store_->recordEvent(clock_.now(), "second", payload);
+  store_->recordEvent(clock_.now(), {"first", "second"}, {{"n", 1}});
   ASSERT_TRUE(store_->flush(std::chrono::seconds(30)));
   ASSERT_EQ(open(), StoreReader::Outcome::kDone);
   std::vector<StoredEvent> all;
