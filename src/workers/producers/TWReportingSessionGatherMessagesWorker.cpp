@@ -8,14 +8,19 @@
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingUtility.h"
-#include "workers/producers/IntervalSummaries.h"
+#include "workers/producers/IntervalWalk.h"
 #include "workers/sinks/TWReportingSessionMetriconWorker.h"
 #include "workers/sinks/TWReportingSessionSummaryJsonFileWorker.h"
 
 namespace tonewerk {
 namespace {
 
-constexpr IntervalSummaries::Words kWords{"createGatherMessages", "gather", "playingTime"};
+constexpr IntervalWalk::Kind kKind{.runningKey = TWReportingMessageKeySessionOutputRunning,
+                                   .openInterval = IntervalWalk::OpenInterval::kContinues,
+                                   .category = kCategoryGather,
+                                   .function = "createGatherMessages",
+                                   .subject = "gather",
+                                   .length = "playingTime"};
 
 ValueMap defaultState() {
   return {{TWReportingMessageKeySelectedFormat, "unknown"},
@@ -26,82 +31,39 @@ ValueMap defaultState() {
 
 bool isInGather(const ValueMap& map) { return map.integer(TWReportingMessageKeyGatherSession) == 1; }
 
-bool differsAsText(const ValueMap& state, const ValueMap& message, std::string_view key) {
-  const Value* before = state.find(key);
-  const Value* now = message.find(key);
-  return before != nullptr && now != nullptr && before->text() != now->text();
-}
-
-// One walk over a session's messages.
-class Walk {
+class GatherWalk final : public IntervalWalk {
  public:
-  // A stretch that the previous values show as open goes on from their time.
-  Walk(const ValueMap& previousValues, double minimumPlaytime)
-      : state_(defaultState()), summaries_(kWords, minimumPlaytime) {
-    state_.merge(previousValues);
-    isPlaying_ = state_.boolean(TWReportingMessageKeySessionOutputRunning);
-    if (isPlaying_) stretchStart_ = IntervalSummaries::timestampOf(state_);
-  }
-
-  void step(const ValueMap& message) {
-    const std::optional<Value> timestamp = IntervalSummaries::timestampOf(message);
-    const bool wasPlaying = state_.boolean(TWReportingMessageKeySessionOutputRunning);
-    bool closes = message.contains(TWReportingMessageKeySessionDuration);
-    if (const Value* running = message.find(TWReportingMessageKeySessionOutputRunning)) {
-      isPlaying_ = running->boolean();
-      if (!wasPlaying && isPlaying_ && isInGather(message)) stretchStart_ = timestamp;
-      if (!isPlaying_ || (isInGather(state_) && !isInGather(message))) closes = true;
-    } else if (closes) {
-      isPlaying_ = false;
-    }
-    if (wasPlaying && (closes || contextCloses(message))) {
-      closeStretch(timestamp);
-      stretchStart_ = timestamp;  // of the next one, when output keeps running
-    }
-    if (!isPlaying_) stretchStart_.reset();
-    state_.merge(message);
-  }
-
-  TWReportingSessionMessages finish() { return summaries_.finish(); }
+  GatherWalk(const LogSite& site, const ValueMap& previousValues, double minimumPlaytime)
+      : IntervalWalk(kKind, site, minimumPlaytime, defaultState(), previousValues) {}
 
  private:
-  bool contextCloses(const ValueMap& message) const {
-    if (!isPlaying_) return false;
-    if (differsAsText(state_, message, TWReportingMessageKeySelectedFormat) ||
-        differsAsText(state_, message, TWReportingMessageKeyActiveDevices)) {
+  bool begins(const ValueMap& message) const override { return isInGather(message); }
+
+  bool endsInterval(const ValueMap& message) const override {
+    // Another start of output outside a Gather session ends an interval that was in one.
+    if (message.contains(TWReportingMessageKeySessionOutputRunning) && isInGather(state()) &&
+        !isInGather(message)) {
       return true;
     }
-    // Leaving a Gather session closes nothing here; a 0 in a stretch that was in none does.
-    const Value* gather = message.find(TWReportingMessageKeyGatherSession);
-    return gather != nullptr && gather->integer() == 0 && !isInGather(state_);
-  }
-
-  void closeStretch(const std::optional<Value>& timestamp) {
-    const auto playingTime = summaries_.measure(TWReportingSessionCategory(), stretchStart_, timestamp);
-    if (!playingTime || !state_.contains(TWReportingMessageKeyGatherSession)) {
-      return summaries_.skip(TWReportingSessionCategory());
+    if (changesText(message, TWReportingMessageKeySelectedFormat) ||
+        changesText(message, TWReportingMessageKeyActiveDevices)) {
+      return true;
     }
-    summaries_.add(TWReportingSessionCategory(), summaryOf(*playingTime), kCategoryGather)
-        .destinationWorkers = {&TWReportingSessionMetriconWorker::kWorkerClass,
-                               &TWReportingSessionSummaryJsonFileWorker::kWorkerClass};
+    // Leaving a Gather session ends nothing here. A 0 ends an interval that was in none.
+    const Value* gather = message.find(TWReportingMessageKeyGatherSession);
+    return gather != nullptr && gather->integer() == 0 && !isInGather(state());
   }
 
-  // What the closing stretch was played with: the state before the message that closes it.
-  ValueMap summaryOf(double playingTime) const {
-    const auto carried = [this](std::string_view key) { return *state_.find(key); };
-    return {{TWReportingMessageKeySelectedFormat, carried(TWReportingMessageKeySelectedFormat)},
-            {TWReportingMessageKeyFormatID, carried(TWReportingMessageKeyFormatID)},
-            {TWReportingMessageKeyActiveDevices, carried(TWReportingMessageKeyActiveDevices)},
-            {TWReportingMessageKeyPlayseconds, IntervalSummaries::seconds(playingTime)},
-            {TWReportingMessageKeyChannelsPerFrame, carried(TWReportingMessageKeyChannelsPerFrame)},
-            {TWReportingMessageKeyPlaysecondsBucketed, IntervalSummaries::bucketedSeconds(playingTime)},
-            {TWReportingMessageKeyMessageIndex, summaries_.nextIndex()}};
+  std::optional<ValueMap> summaryOf(const Interval& interval) override {
+    if (!state().contains(TWReportingMessageKeyGatherSession)) return std::nullopt;
+    return ValueMap{{TWReportingMessageKeySelectedFormat, current(TWReportingMessageKeySelectedFormat)},
+                    {TWReportingMessageKeyFormatID, current(TWReportingMessageKeyFormatID)},
+                    {TWReportingMessageKeyActiveDevices, current(TWReportingMessageKeyActiveDevices)},
+                    {TWReportingMessageKeyPlayseconds, interval.length()},
+                    {TWReportingMessageKeyChannelsPerFrame, current(TWReportingMessageKeyChannelsPerFrame)},
+                    {TWReportingMessageKeyPlaysecondsBucketed, interval.bucketedLength()},
+                    {TWReportingMessageKeyMessageIndex, interval.index}};
   }
-
-  ValueMap state_;  // the latest value of every key
-  bool isPlaying_ = false;
-  std::optional<Value> stretchStart_;
-  IntervalSummaries summaries_;
 };
 
 }  // namespace
@@ -123,9 +85,14 @@ TWReportingSessionMessages TWReportingSessionGatherMessagesWorker::createGatherM
     const TWReportingSessionMessages& messages, double minimumPlaytime) const {
   debugLog(TWReportingSessionCategory(), "entering createGatherMessages %s", "createGatherMessages");
   const auto owner = session.lock();
-  Walk walk(owner == nullptr ? ValueMap() : owner->previousValues(), minimumPlaytime);
-  for (const auto& message : messages) walk.step(message->message);
-  return walk.finish();
+  GatherWalk walk(TWReportingSessionCategory(), owner == nullptr ? ValueMap() : owner->previousValues(),
+                  minimumPlaytime);
+  TWReportingSessionMessages summaries = walk.summariesOf(messages);
+  for (const auto& summary : summaries) {
+    summary->destinationWorkers = {&TWReportingSessionMetriconWorker::kWorkerClass,
+                                   &TWReportingSessionSummaryJsonFileWorker::kWorkerClass};
+  }
+  return summaries;
 }
 
 }  // namespace tonewerk

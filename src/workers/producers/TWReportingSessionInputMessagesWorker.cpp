@@ -12,7 +12,7 @@
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionWorkerUtility.h"
 #include "session/TWReportingUtility.h"
-#include "workers/producers/IntervalSummaries.h"
+#include "workers/producers/IntervalWalk.h"
 
 namespace tonewerk {
 namespace {
@@ -20,7 +20,14 @@ namespace {
 constexpr std::array<std::string_view, 2> kKeysToCombine{TWReportingMessageKeySpatialAudioAccessoryFeature,
                                                          TWReportingMessageKeySpatializationEnabled};
 constexpr double kMaxPauseSeconds = 2.0;  // less than for volume summaries, on purpose
-constexpr IntervalSummaries::Words kWords{"createInputMessages", "input", "runningTime"};
+// An interval that the previous values show as running has no begin: what they say of input stays, so the first
+// message finds it running.
+constexpr IntervalWalk::Kind kKind{.runningKey = TWReportingMessageKeySessionInputRunning,
+                                   .openInterval = IntervalWalk::OpenInterval::kNoBegin,
+                                   .category = kCategoryInput,
+                                   .function = "createInputMessages",
+                                   .subject = "input",
+                                   .length = "runningTime"};
 
 // A sample rate below 1: no vocoder runs.
 constexpr std::string_view kNoRate = "0.";
@@ -44,82 +51,45 @@ std::string joined(const std::set<std::string>& names) {
   return text;
 }
 
-// One walk over a session's messages.
-class Walk {
+class InputWalk final : public IntervalWalk {
  public:
-  // No stretch is open at first, whatever the previous values say. If they say that input runs, the first
-  // message finds it running, so a stretch is only begun by a change of devices or a stop and another start.
-  Walk(const ValueMap& previousValues, const SharedString* process, double minimumRunningtime)
-      : process_(process), state_(defaultState()), summaries_(kWords, minimumRunningtime) {
-    state_.merge(previousValues);
-  }
-
-  void step(const ValueMap& message) {
-    const std::optional<Value> timestamp = IntervalSummaries::timestampOf(message);
-    const bool wasRunning = state_.boolean(TWReportingMessageKeySessionInputRunning);
-    const bool isLast = message.contains(TWReportingMessageKeySessionDuration);
-    bool changed = isLast;
-    if (const Value* running = message.find(TWReportingMessageKeySessionInputRunning)) {
-      isRunning_ = running->boolean();
-      if (!wasRunning && isRunning_) stretchStart_ = timestamp;
-      if (wasRunning && !isRunning_) changed = true;
-    } else if (isLast) {
-      isRunning_ = false;
-    }
-    if (isRunning_) {
-      if (hasChanged(message, TWReportingMessageKeyActiveDevices)) changed = true;
-      collectVocoder(message);
-    }
-    if (wasRunning && changed) {
-      closeStretch(timestamp);
-      stretchStart_ = timestamp;  // of the next one, when input keeps running
-    }
-    if (!isRunning_) stretchStart_.reset();
-    state_.merge(message);
-  }
-
-  TWReportingSessionMessages finish() { return summaries_.finish(); }
+  InputWalk(const LogSite& site, const ValueMap& previousValues, const SharedString* process,
+            double minimumRunningtime)
+      : IntervalWalk(kKind, site, minimumRunningtime, defaultState(), previousValues), process_(process) {}
 
  private:
-  bool hasChanged(const ValueMap& message, std::string_view key) const {
-    return TWReportingUtilityKeyIsPresentAndHasChanged(key, &message, &state_);
+  bool endsInterval(const ValueMap& message) const override {
+    return changes(message, TWReportingMessageKeyActiveDevices);
   }
 
-  void collectVocoder(const ValueMap& message) {
-    if (!hasChanged(message, TWReportingMessageKeyVpConfigPrimaryVocoder)) return;
+  void collect(const ValueMap& message) override {
+    if (!changes(message, TWReportingMessageKeyVpConfigPrimaryVocoder)) return;
     const std::string rate = textOf(message.find(TWReportingMessageKeyVpConfigPrimaryVocoderFs));
     if (rate.starts_with(kNoRate)) return;
     vocoders_.insert(message.text(TWReportingMessageKeyVpConfigPrimaryVocoder) + ":" + rate);
   }
 
-  void closeStretch(const std::optional<Value>& timestamp) {
-    const auto runningTime = summaries_.measure(TWReportingSessionCategory(), stretchStart_, timestamp);
-    if (!runningTime || process_ == nullptr) return summaries_.skip(TWReportingSessionCategory());
-    summaries_.add(TWReportingSessionCategory(), summaryOf(*runningTime), kCategoryInput);
-    vocoders_.clear();
-  }
-
-  // What the closing stretch ran with: the state before the message that closes it.
-  ValueMap summaryOf(double runningTime) const {
-    const auto carried = [this](std::string_view key) { return *state_.find(key); };
+  std::optional<ValueMap> summaryOf(const Interval& interval) override {
+    if (process_ == nullptr) return std::nullopt;
     ValueMap summary{
         {TWReportingApplicationName, *process_},
-        {TWReportingMessageKeyInputrunningSeconds, IntervalSummaries::seconds(runningTime)},
-        {TWReportingMessageKeyInputrunningSecondsBucketed, IntervalSummaries::bucketedSeconds(runningTime)},
-        {TWReportingMessageKeyMessageIndex, summaries_.nextIndex()},
-        {TWReportingMessageKeyVpConfigOperationMode, carried(TWReportingMessageKeyVpConfigOperationMode)},
-        {TWReportingMessageKeyVpConfigInputPort, carried(TWReportingMessageKeyVpConfigInputPort)},
-        {TWReportingMessageKeyActiveDevices, carried(TWReportingMessageKeyActiveDevices)}};
+        {TWReportingMessageKeyInputrunningSeconds, interval.length()},
+        {TWReportingMessageKeyInputrunningSecondsBucketed, interval.bucketedLength()},
+        {TWReportingMessageKeyMessageIndex, interval.index},
+        {TWReportingMessageKeyVpConfigOperationMode, current(TWReportingMessageKeyVpConfigOperationMode)},
+        {TWReportingMessageKeyVpConfigInputPort, current(TWReportingMessageKeyVpConfigInputPort)},
+        {TWReportingMessageKeyActiveDevices, current(TWReportingMessageKeyActiveDevices)}};
     if (!vocoders_.empty()) summary.set(TWReportingMessageKeyVocoders, joined(vocoders_));
+    vocoders_.clear();
     return summary;
   }
 
-  const SharedString* process_;
-  ValueMap state_;  // the latest value of every key
-  bool isRunning_ = false;
-  std::optional<Value> stretchStart_;
+  bool changes(const ValueMap& message, std::string_view key) const {
+    return TWReportingUtilityKeyIsPresentAndHasChanged(key, &message, &state());
+  }
+
+  const SharedString* process_;     // null gives no summaries
   std::set<std::string> vocoders_;  // changed to since the last summary, each as "name:rate"
-  IntervalSummaries summaries_;
 };
 
 }  // namespace
@@ -144,12 +114,10 @@ TWReportingSessionMessages TWReportingSessionInputMessagesWorker::createInputMes
     double minimumRunningtime) const {
   debugLog(TWReportingSessionCategory(), "entering createInputMessages %s", "createInputMessages");
   const auto owner = session.lock();
-  Walk walk(owner == nullptr ? ValueMap() : owner->previousValues(), process, minimumRunningtime);
-  for (const auto& message :
-       TWReportingSessionWorkerUtility::combineRapidMessages(messages, kKeysToCombine, kMaxPauseSeconds)) {
-    walk.step(message->message);
-  }
-  TWReportingSessionMessages summaries = walk.finish();
+  InputWalk walk(TWReportingSessionCategory(), owner == nullptr ? ValueMap() : owner->previousValues(),
+                 process, minimumRunningtime);
+  TWReportingSessionMessages summaries = walk.summariesOf(
+      TWReportingSessionWorkerUtility::combineRapidMessages(messages, kKeysToCombine, kMaxPauseSeconds));
   debugLog(TWReportingSessionCategory(), "returning input messages { func=%s, action=return, count=%lu }",
            "createInputMessages", summaries.size());
   return summaries;
