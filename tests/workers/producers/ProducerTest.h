@@ -1,14 +1,19 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <array>
 #include <cmath>
-#include <gtest/gtest.h>
+#include <cstdint>
+#include <functional>
+#include <gmock/gmock.h>
 #include <memory>
 #include <rapidcheck/gtest.h>
 #include <string>
+#include <string_view>
 #include <utility>
 #include <vector>
 
+#include "session/TWReportingSessionWorkerUtility.h"
 #include "support/ReportingTest.h"
 
 namespace tonewerk {
@@ -29,11 +34,22 @@ struct StreamCase {
 inline const Value kOn(true);
 inline const Value kOff(false);
 
-// What the tests of the producers of summaries begin with: a session, and streams to fold.
+// The fixture of the tests of producers of summaries: a session, streams to fold, and what all producers do alike.
 class ProducerTest : public ReportingTest {
  protected:
   explicit ProducerTest(Classes workerClasses)
       : ReportingTest(std::move(workerClasses)), session(makeSession()) {}
+
+  // What the producer makes of stored messages. Intervals of half a second or less are too short.
+  virtual TWReportingSessionMessages summariesOf(const TWReportingSessionMessages& messages) = 0;
+  // A summary in the short form of StreamCase.
+  virtual std::string shortFormOf(const ValueMap& summary) const = 0;
+
+  std::vector<std::string> shortFormsOf(const std::vector<Step>& steps) {
+    std::vector<std::string> texts;
+    for (const auto& summary : summariesOf(stream(steps))) texts.push_back(shortFormOf(summary->message));
+    return texts;
+  }
 
   static TWReportingSessionMessages stream(const std::vector<Step>& steps) {
     TWReportingSessionMessages messages;
@@ -75,6 +91,75 @@ class ProducerTest : public ReportingTest {
     std::vector<ValueMap> payloads;
     for (const auto& held : messages) payloads.push_back(held->message);
     return payloads;
+  }
+
+  static void expectAProducerFromTheSessionsStart(const TWReportingSessionWorkerClass& workerClass) {
+    EXPECT_TRUE(workerClass.isProducer);
+    EXPECT_FALSE(workerClass.isConsumer);
+    EXPECT_FALSE(workerClass.startOnInit);
+    EXPECT_FALSE(workerClass.handleSingleMessageSession);
+  }
+
+  // `steps` yield two summaries.
+  void expectNumbersAndACount(const std::vector<Step>& steps) {
+    const auto summaries = summariesOf(stream(steps));
+    EXPECT_THAT(textsUnder("msgidx", summaries), ::testing::ElementsAre("1", "2"));
+    EXPECT_THAT(textsUnder("msgcnt", summaries), ::testing::ElementsAre("2", "2"));
+    EXPECT_EQ(summaries[0]->message.find("msgcnt")->kind(), Value::Kind::kUnsigned);
+  }
+
+  // `start` begins an interval that `stop` ends.
+  void expectSinglePrecision(const ValueMap& start, const ValueMap& stop, const char* lengthKey) {
+    const auto summaries = summariesOf(stream({{0, start}, {1.1, stop}}));
+    ASSERT_THAT(summaries, ::testing::SizeIs(1));
+    EXPECT_EQ(summaries[0]->message.number(lengthKey), static_cast<double>(1.1F));
+  }
+
+  void expectNoSummaryWithoutTimes(const ValueMap& start, const ValueMap& stop) {
+    EXPECT_THAT(summariesOf({message(start), messageAt(10, stop)}), ::testing::IsEmpty());
+    EXPECT_THAT(summariesOf({messageAt(0, start), message(stop)}), ::testing::IsEmpty());
+    EXPECT_THAT(summariesOf({messageAt(0, start), messageAt(std::nan(""), stop)}), ::testing::IsEmpty());
+  }
+
+  void expectNothingOfAStopWithoutSummaries() {
+    session->start();
+    session->stop();
+    EXPECT_THAT(test.metricon.events(), ::testing::IsEmpty());
+    EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kDefault), ::testing::IsEmpty());
+  }
+
+  // All debug lines carry the producer's own source file.
+  void expectDebugLinesOf(const std::string& file) {
+    for (const auto& line : test.log.linesOf("twrr", LogLevel::kDebug)) {
+      EXPECT_THAT(line.message, ::testing::StartsWith(file + ":"));
+    }
+  }
+
+  // A property: whatever a stream holds, the walk neither crashes nor reads the clock, and the stored messages are
+  // afterwards what `merge` makes of them. `check` gets each summary.
+  void checkAnyStream(std::vector<std::string> keys, const char* lengthKey,
+                      const std::function<void(const TWReportingSessionMessages& messages)>& merge,
+                      const std::function<void(const TWReportingSessionMessage& summary)>& check) {
+    const auto messages = anyStream(std::move(keys));
+    const auto expected = copiesOf(messages);
+    merge(expected);
+    const std::uint64_t clockReads = test.clock.wallReads();
+
+    const auto summaries = summariesOf(messages);
+    RC_CLASSIFY(!summaries.empty());
+    RC_ASSERT(test.clock.wallReads() == clockReads);
+    RC_ASSERT(payloadsOf(messages) == payloadsOf(expected));
+    for (const auto& summary : summaries) {
+      RC_ASSERT(summary->message.number(lengthKey) > 0.5);
+      RC_ASSERT(summary->message.integer("msgcnt") == static_cast<std::int64_t>(summaries.size()));
+      check(*summary);
+    }
+  }
+
+  // What the producers of volume and input summaries do with rapid spatial messages.
+  static void mergeRapidSpatialMessages(const TWReportingSessionMessages& messages, double maxPauseSeconds) {
+    const std::array<std::string_view, 2> keys{"spatial-audio-accessory-feature", "spatializationEnabled"};
+    TWReportingSessionWorkerUtility::combineRapidMessages(messages, keys, maxPauseSeconds);
   }
 
   std::shared_ptr<TWReportingSession> session;

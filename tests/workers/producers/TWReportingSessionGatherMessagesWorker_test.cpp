@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "workers/producers/TWReportingSessionGatherMessagesWorker.h"
 
-#include <cmath>
 #include <gtest/gtest.h>
 #include <rapidcheck/gtest.h>
 #include <string>
@@ -30,18 +29,13 @@ class GatherMessagesTest : public ProducerTest {
       : ProducerTest({&TWReportingSessionGatherMessagesWorker::kWorkerClass,
                       &TWReportingSessionMetriconWorker::kWorkerClass}) {}
 
-  TWReportingSessionMessages summariesOf(const TWReportingSessionMessages& messages) {
+  TWReportingSessionMessages summariesOf(const TWReportingSessionMessages& messages) override {
     const TWReportingSessionGatherMessagesWorker worker(session);
     return worker.createGatherMessages(messages, 0.5);
   }
 
-  // Each summary as "seconds@devices", in order.
-  std::vector<std::string> playedIn(const std::vector<Step>& steps) {
-    std::vector<std::string> played;
-    for (const auto& summary : summariesOf(stream(steps))) {
-      played.push_back(summary->message.text("play_seconds") + "@" + summary->message.text("active_devices"));
-    }
-    return played;
+  std::string shortFormOf(const ValueMap& summary) const override {
+    return summary.text("play_seconds") + "@" + summary.text("active_devices");
   }
 };
 
@@ -49,7 +43,7 @@ class GatherMessagesTest : public ProducerTest {
 
 class GatherStreamTest : public GatherMessagesTest, public ::testing::WithParamInterface<StreamCase> {};
 
-TEST_P(GatherStreamTest, IsSummarised) { EXPECT_EQ(playedIn(GetParam().stream), GetParam().expected); }
+TEST_P(GatherStreamTest, IsSummarised) { EXPECT_EQ(shortFormsOf(GetParam().stream), GetParam().expected); }
 
 INSTANTIATE_TEST_SUITE_P(
     Streams, GatherStreamTest,
@@ -162,11 +156,7 @@ INSTANTIATE_TEST_SUITE_P(
     [](const auto& tested) { return tested.param.name; });
 
 TEST_F(GatherMessagesTest, IsAProducerFromTheSessionsStart) {
-  const auto& workerClass = TWReportingSessionGatherMessagesWorker::kWorkerClass;
-  EXPECT_TRUE(workerClass.isProducer);
-  EXPECT_FALSE(workerClass.isConsumer);
-  EXPECT_FALSE(workerClass.startOnInit);
-  EXPECT_FALSE(workerClass.handleSingleMessageSession);
+  expectAProducerFromTheSessionsStart(TWReportingSessionGatherMessagesWorker::kWorkerClass);
 }
 
 TEST_F(GatherMessagesTest, ASummaryHoldsTheContextOfTheClosingStretch) {
@@ -206,44 +196,32 @@ TEST_F(GatherMessagesTest, SummariesAreForTheAnalyticsAndTheJsonFileOnly) {
 }
 
 TEST_F(GatherMessagesTest, SummariesAreNumberedAndCounted) {
-  const auto summaries = summariesOf(
-      stream({{0, {{kRunning, kOn}, {kGather, 1}}}, {3, {{kDevices, "A"}}}, {10, {{kRunning, kOff}}}}));
-  EXPECT_THAT(textsUnder("msgidx", summaries), ElementsAre("1", "2"));
-  EXPECT_THAT(textsUnder("msgcnt", summaries), ElementsAre("2", "2"));
-  EXPECT_EQ(summaries[0]->message.find("msgcnt")->kind(), Value::Kind::kUnsigned);
+  expectNumbersAndACount(
+      {{0, {{kRunning, kOn}, {kGather, 1}}}, {3, {{kDevices, "A"}}}, {10, {{kRunning, kOff}}}});
 }
 
 TEST_F(GatherMessagesTest, PlaySecondsHaveSinglePrecision) {
-  const auto summaries =
-      summariesOf(stream({{0, {{kRunning, kOn}, {kGather, 1}}}, {1.1, {{kRunning, kOff}}}}));
-  ASSERT_THAT(summaries, SizeIs(1));
-  EXPECT_EQ(summaries[0]->message.number("play_seconds"), static_cast<double>(1.1F));
+  expectSinglePrecision({{kRunning, kOn}, {kGather, 1}}, {{kRunning, kOff}}, "play_seconds");
 }
 
 TEST_F(GatherMessagesTest, WithoutTimesThereIsNoSummary) {
-  EXPECT_THAT(summariesOf({message({{kRunning, kOn}, {kGather, 1}}), messageAt(10, {{kRunning, kOff}})}),
-              IsEmpty());
-  EXPECT_THAT(summariesOf({messageAt(0, {{kRunning, kOn}, {kGather, 1}}), message({{kRunning, kOff}})}),
-              IsEmpty());
-  EXPECT_THAT(summariesOf({messageAt(0, {{kRunning, kOn}, {kGather, 1}}),
-                           messageAt(std::nan(""), {{kRunning, kOff}})}),
-              IsEmpty());
+  expectNoSummaryWithoutTimes({{kRunning, kOn}, {kGather, 1}}, {{kRunning, kOff}});
 }
 
 TEST_F(GatherMessagesTest, AnOpenStretchInThePreviousValuesGoesOn) {
   session->addPreviousValues(
       {{kRunning, kOn}, {kGather, 1}, {kDevices, "Speaker"}, {"twreporting_timestamp", 4.0}});
-  EXPECT_THAT(playedIn({{10, {{kRunning, kOff}}}}), ElementsAre("6@Speaker"));
+  EXPECT_THAT(shortFormsOf({{10, {{kRunning, kOff}}}}), ElementsAre("6@Speaker"));
 }
 
 TEST_F(GatherMessagesTest, AnOpenStretchOutsideGatherInThePreviousValuesYieldsNoSummary) {
   session->addPreviousValues({{kRunning, kOn}, {"twreporting_timestamp", 4.0}});
-  EXPECT_THAT(playedIn({{10, {{kRunning, kOff}}}}), IsEmpty());
+  EXPECT_THAT(shortFormsOf({{10, {{kRunning, kOff}}}}), IsEmpty());
 }
 
 TEST_F(GatherMessagesTest, AnyValueUnderGatherSessionIsEnoughForAnOpenStretch) {
   session->addPreviousValues({{kRunning, kOn}, {kGather, 0}, {"twreporting_timestamp", 4.0}});
-  EXPECT_THAT(playedIn({{10, {{kRunning, kOff}}}}), ElementsAre("6@unknown"));
+  EXPECT_THAT(shortFormsOf({{10, {{kRunning, kOff}}}}), ElementsAre("6@unknown"));
 }
 
 TEST_F(GatherMessagesTest, RapidSpatialMessagesStayApart) {
@@ -271,15 +249,12 @@ TEST_F(GatherMessagesTest, StopSendsTheSummariesIntoTheSession) {
 }
 
 TEST_F(GatherMessagesTest, AStopWithoutSummariesSendsAndSaysNothing) {
-  session->start();
-  session->stop();
-  EXPECT_THAT(test.metricon.events(), IsEmpty());
-  EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kDefault), IsEmpty());
+  expectNothingOfAStopWithoutSummaries();
 }
 
 TEST_F(GatherMessagesTest, SaysWhatItDoesWithEachStretch) {
   test.log.clear();
-  playedIn({{0, {{kRunning, kOn}, {kGather, 1}}}, {2, {{kDevices, "A"}}}, {2.25, {{kRunning, kOff}}}});
+  shortFormsOf({{0, {{kRunning, kOn}, {kGather, 1}}}, {2, {{kDevices, "A"}}}, {2.25, {{kRunning, kOff}}}});
   EXPECT_THAT(
       test.log.textsOf("twrr", LogLevel::kDebug),
       ElementsAre("entering createGatherMessages createGatherMessages",
@@ -288,30 +263,18 @@ TEST_F(GatherMessagesTest, SaysWhatItDoesWithEachStretch) {
                   "added gather message { func=createGatherMessages, action=add, count=1 }",
                   StartsWith("playingTime { func=createGatherMessages, playingTime=0.250000,"),
                   "skipped gather message, too short { func=createGatherMessages, action=skip, count=1 }"));
-  for (const auto& line : test.log.linesOf("twrr", LogLevel::kDebug)) {
-    EXPECT_THAT(line.message, StartsWith("TWReportingSessionGatherMessagesWorker:"));
-  }
+  expectDebugLinesOf("TWReportingSessionGatherMessagesWorker");
 }
 
-// Whatever a stream holds, the walk neither crashes nor reads the clock, and leaves the stored messages as
-// they are.
 RC_GTEST_FIXTURE_PROP(GatherMessagesTest, SurvivesAnyStream, ()) {
-  const auto messages =
-      anyStream({kRunning, kGather, kDevices, kFormat, "session_duration", "mFormatID", "mChannelsPerFrame",
-                 "spatializationEnabled", "spatial-audio-accessory-feature", "other"});
-  const auto before = payloadsOf(copiesOf(messages));
-  const std::uint64_t clockReads = test.clock.wallReads();
-
-  const auto summaries = summariesOf(messages);
-  RC_CLASSIFY(!summaries.empty());
-  RC_ASSERT(test.clock.wallReads() == clockReads);
-  RC_ASSERT(payloadsOf(messages) == before);
-  for (const auto& summary : summaries) {
-    RC_ASSERT(summary->message.number("play_seconds") > 0.5);
-    RC_ASSERT(summary->message.size() == 8U);
-    RC_ASSERT(summary->message.integer("msgcnt") == static_cast<std::int64_t>(summaries.size()));
-    RC_ASSERT(summary->destinationWorkers.size() == 2U);
-  }
+  checkAnyStream(
+      {kRunning, kGather, kDevices, kFormat, "session_duration", "mFormatID", "mChannelsPerFrame",
+       "spatializationEnabled", "spatial-audio-accessory-feature", "other"},
+      "play_seconds", [](const TWReportingSessionMessages&) {},
+      [](const TWReportingSessionMessage& summary) {
+        RC_ASSERT(summary.message.size() == 8U);
+        RC_ASSERT(summary.destinationWorkers.size() == 2U);
+      });
 }
 
 }  // namespace

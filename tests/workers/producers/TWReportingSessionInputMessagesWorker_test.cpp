@@ -1,15 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "workers/producers/TWReportingSessionInputMessagesWorker.h"
 
-#include <array>
-#include <cmath>
 #include <gtest/gtest.h>
 #include <rapidcheck/gtest.h>
 #include <string>
-#include <string_view>
 #include <vector>
 
-#include "session/TWReportingSessionWorkerUtility.h"
 #include "workers/producers/ProducerTest.h"
 #include "workers/sinks/TWReportingSessionMetriconWorker.h"
 
@@ -32,21 +28,16 @@ class InputMessagesTest : public ProducerTest {
       : ProducerTest({&TWReportingSessionInputMessagesWorker::kWorkerClass,
                       &TWReportingSessionMetriconWorker::kWorkerClass}) {}
 
-  TWReportingSessionMessages summariesOf(const TWReportingSessionMessages& messages) {
+  TWReportingSessionMessages summariesOf(const TWReportingSessionMessages& messages) override {
     const TWReportingSessionInputMessagesWorker worker(session);
     const SharedString process("com.orvane.recorder");
     return worker.createInputMessages(messages, &process, 0.5);
   }
 
-  // Each summary as "seconds@devices", with its vocoders behind a space, in order.
-  std::vector<std::string> ranIn(const std::vector<Step>& steps) {
-    std::vector<std::string> ran;
-    for (const auto& summary : summariesOf(stream(steps))) {
-      const ValueMap& says = summary->message;
-      ran.push_back(says.text("inputrunning_seconds") + "@" + says.text("active_devices"));
-      if (says.contains("vocoders")) ran.back() += " " + says.text("vocoders");
-    }
-    return ran;
+  // With the vocoders behind a space.
+  std::string shortFormOf(const ValueMap& summary) const override {
+    const std::string text = summary.text("inputrunning_seconds") + "@" + summary.text("active_devices");
+    return summary.contains("vocoders") ? text + " " + summary.text("vocoders") : text;
   }
 };
 
@@ -54,7 +45,7 @@ class InputMessagesTest : public ProducerTest {
 
 class InputStreamTest : public InputMessagesTest, public ::testing::WithParamInterface<StreamCase> {};
 
-TEST_P(InputStreamTest, IsSummarised) { EXPECT_EQ(ranIn(GetParam().stream), GetParam().expected); }
+TEST_P(InputStreamTest, IsSummarised) { EXPECT_EQ(shortFormsOf(GetParam().stream), GetParam().expected); }
 
 INSTANTIATE_TEST_SUITE_P(
     Streams, InputStreamTest,
@@ -190,11 +181,7 @@ INSTANTIATE_TEST_SUITE_P(
     [](const auto& tested) { return tested.param.name; });
 
 TEST_F(InputMessagesTest, IsAProducerFromTheSessionsStart) {
-  const auto& workerClass = TWReportingSessionInputMessagesWorker::kWorkerClass;
-  EXPECT_TRUE(workerClass.isProducer);
-  EXPECT_FALSE(workerClass.isConsumer);
-  EXPECT_FALSE(workerClass.startOnInit);
-  EXPECT_FALSE(workerClass.handleSingleMessageSession);
+  expectAProducerFromTheSessionsStart(TWReportingSessionInputMessagesWorker::kWorkerClass);
 }
 
 TEST_F(InputMessagesTest, ASummaryHoldsTheContextOfTheClosingStretch) {
@@ -228,17 +215,11 @@ TEST_F(InputMessagesTest, WhatIsNotKnownIsUnknownAndWithoutVocodersThereIsNoList
 }
 
 TEST_F(InputMessagesTest, SummariesAreNumberedAndCounted) {
-  const auto summaries =
-      summariesOf(stream({{0, {{kRunning, kOn}}}, {3, {{kDevices, "Mic"}}}, {10, {{kRunning, kOff}}}}));
-  EXPECT_THAT(textsUnder("msgidx", summaries), ElementsAre("1", "2"));
-  EXPECT_THAT(textsUnder("msgcnt", summaries), ElementsAre("2", "2"));
-  EXPECT_EQ(summaries[0]->message.find("msgcnt")->kind(), Value::Kind::kUnsigned);
+  expectNumbersAndACount({{0, {{kRunning, kOn}}}, {3, {{kDevices, "Mic"}}}, {10, {{kRunning, kOff}}}});
 }
 
 TEST_F(InputMessagesTest, RunningSecondsHaveSinglePrecision) {
-  const auto summaries = summariesOf(stream({{0, {{kRunning, kOn}}}, {1.1, {{kRunning, kOff}}}}));
-  ASSERT_THAT(summaries, SizeIs(1));
-  EXPECT_EQ(summaries[0]->message.number("inputrunning_seconds"), static_cast<double>(1.1F));
+  expectSinglePrecision({{kRunning, kOn}}, {{kRunning, kOff}}, "inputrunning_seconds");
 }
 
 TEST_F(InputMessagesTest, WithoutAProcessThereIsNoSummary) {
@@ -249,10 +230,7 @@ TEST_F(InputMessagesTest, WithoutAProcessThereIsNoSummary) {
 }
 
 TEST_F(InputMessagesTest, WithoutTimesThereIsNoSummary) {
-  EXPECT_THAT(summariesOf({message({{kRunning, kOn}}), messageAt(10, {{kRunning, kOff}})}), IsEmpty());
-  EXPECT_THAT(summariesOf({messageAt(0, {{kRunning, kOn}}), message({{kRunning, kOff}})}), IsEmpty());
-  EXPECT_THAT(summariesOf({messageAt(0, {{kRunning, kOn}}), messageAt(std::nan(""), {{kRunning, kOff}})}),
-              IsEmpty());
+  expectNoSummaryWithoutTimes({{kRunning, kOn}}, {{kRunning, kOff}});
 }
 
 TEST_F(InputMessagesTest, TheWalkBeginsWithThePreviousValues) {
@@ -265,19 +243,20 @@ TEST_F(InputMessagesTest, TheWalkBeginsWithThePreviousValues) {
 
 TEST_F(InputMessagesTest, InputThatThePreviousValuesShowRunningBeginsNoStretch) {
   session->addPreviousValues({{kRunning, kOn}, {"twreporting_timestamp", 0.0}});
-  EXPECT_THAT(ranIn({{10, {{kRunning, kOff}}}}), IsEmpty());
-  EXPECT_THAT(ranIn({{10, {{kRunning, kOn}}}, {20, {{kRunning, kOff}}}}), IsEmpty());
-  EXPECT_THAT(ranIn({{10, {{kRunning, kOn}}},
-                     {12, {{kRunning, kOff}}},
-                     {20, {{kRunning, kOn}}},
-                     {23, {{kRunning, kOff}}}}),
+  EXPECT_THAT(shortFormsOf({{10, {{kRunning, kOff}}}}), IsEmpty());
+  EXPECT_THAT(shortFormsOf({{10, {{kRunning, kOn}}}, {20, {{kRunning, kOff}}}}), IsEmpty());
+  EXPECT_THAT(shortFormsOf({{10, {{kRunning, kOn}}},
+                            {12, {{kRunning, kOff}}},
+                            {20, {{kRunning, kOn}}},
+                            {23, {{kRunning, kOff}}}}),
               ElementsAre("3@unknown"));
 }
 
 TEST_F(InputMessagesTest, InputThatThePreviousValuesShowRunningIsStillChangedByNewDevices) {
   session->addPreviousValues({{kRunning, kOn}, {kDevices, "Mic"}});
-  EXPECT_THAT(ranIn({{10, {{kRunning, kOn}}}, {12, {{kDevices, "Headset"}}}, {20, {{kRunning, kOff}}}}),
-              ElementsAre("8@Headset"));
+  EXPECT_THAT(
+      shortFormsOf({{10, {{kRunning, kOn}}}, {12, {{kDevices, "Headset"}}}, {20, {{kRunning, kOff}}}}),
+      ElementsAre("8@Headset"));
 }
 
 TEST_F(InputMessagesTest, RapidSpatialMessagesAreMergedIntoTheFirst) {
@@ -318,15 +297,12 @@ TEST_F(InputMessagesTest, StopSendsTheSummariesIntoTheSession) {
 }
 
 TEST_F(InputMessagesTest, AStopWithoutSummariesSendsAndSaysNothing) {
-  session->start();
-  session->stop();
-  EXPECT_THAT(test.metricon.events(), IsEmpty());
-  EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kDefault), IsEmpty());
+  expectNothingOfAStopWithoutSummaries();
 }
 
 TEST_F(InputMessagesTest, SaysWhatItDoesWithEachStretch) {
   test.log.clear();
-  ranIn({{0, {{kRunning, kOn}}}, {2, {{kDevices, "Mic"}}}, {2.25, {{kRunning, kOff}}}});
+  shortFormsOf({{0, {{kRunning, kOn}}}, {2, {{kDevices, "Mic"}}}, {2.25, {{kRunning, kOff}}}});
   EXPECT_THAT(
       test.log.textsOf("twrr", LogLevel::kDebug),
       ElementsAre("entering createInputMessages createInputMessages",
@@ -336,31 +312,17 @@ TEST_F(InputMessagesTest, SaysWhatItDoesWithEachStretch) {
                   StartsWith("runningTime { func=createInputMessages, runningTime=0.250000,"),
                   "skipped input message, too short { func=createInputMessages, action=skip, count=1 }",
                   "returning input messages { func=createInputMessages, action=return, count=1 }"));
-  for (const auto& line : test.log.linesOf("twrr", LogLevel::kDebug)) {
-    EXPECT_THAT(line.message, StartsWith("TWReportingSessionInputMessagesWorker:"));
-  }
+  expectDebugLinesOf("TWReportingSessionInputMessagesWorker");
 }
 
-// Whatever a stream holds, the walk neither crashes nor reads the clock, and changes the stored messages by
-// nothing but the merging of rapid ones.
 RC_GTEST_FIXTURE_PROP(InputMessagesTest, SurvivesAnyStream, ()) {
-  const auto messages = anyStream({kRunning, kDevices, kVocoder, kRate, "session_duration",
-                                   "spatializationEnabled", "spatial-audio-accessory-feature",
-                                   "vp_config_operation_mode", "vp_config_input_port", "other"});
-  const auto expected = copiesOf(messages);
-  const std::array<std::string_view, 2> keys{"spatial-audio-accessory-feature", "spatializationEnabled"};
-  TWReportingSessionWorkerUtility::combineRapidMessages(expected, keys, 2.0);
-  const std::uint64_t clockReads = test.clock.wallReads();
-
-  const auto summaries = summariesOf(messages);
-  RC_CLASSIFY(!summaries.empty());
-  RC_ASSERT(test.clock.wallReads() == clockReads);
-  RC_ASSERT(payloadsOf(messages) == payloadsOf(expected));
-  for (const auto& summary : summaries) {
-    RC_ASSERT(summary->message.number("inputrunning_seconds") > 0.5);
-    RC_ASSERT(summary->message.size() == (summary->message.contains("vocoders") ? 9U : 8U));
-    RC_ASSERT(summary->message.integer("msgcnt") == static_cast<std::int64_t>(summaries.size()));
-  }
+  checkAnyStream(
+      {kRunning, kDevices, kVocoder, kRate, "session_duration", "spatializationEnabled",
+       "spatial-audio-accessory-feature", "vp_config_operation_mode", "vp_config_input_port", "other"},
+      "inputrunning_seconds", [](const auto& messages) { mergeRapidSpatialMessages(messages, 2.0); },
+      [](const TWReportingSessionMessage& summary) {
+        RC_ASSERT(summary.message.size() == (summary.message.contains("vocoders") ? 9U : 8U));
+      });
 }
 
 }  // namespace

@@ -1,15 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "workers/producers/TWReportingSessionVolumeMessagesWorker.h"
 
-#include <array>
-#include <cmath>
 #include <gtest/gtest.h>
 #include <rapidcheck/gtest.h>
 #include <string>
-#include <string_view>
 #include <vector>
 
-#include "session/TWReportingSessionWorkerUtility.h"
 #include "workers/producers/ProducerTest.h"
 #include "workers/sinks/TWReportingSessionMetriconWorker.h"
 
@@ -27,20 +23,14 @@ class VolumeMessagesTest : public ProducerTest {
       : ProducerTest({&TWReportingSessionVolumeMessagesWorker::kWorkerClass,
                       &TWReportingSessionMetriconWorker::kWorkerClass}) {}
 
-  TWReportingSessionMessages summariesOf(const TWReportingSessionMessages& messages) {
+  TWReportingSessionMessages summariesOf(const TWReportingSessionMessages& messages) override {
     const TWReportingSessionVolumeMessagesWorker worker(session);
     const SharedString process("com.orvane.player");
     return worker.createVolumeMessages(messages, &process, 0.5);
   }
 
-  // Each summary as "seconds@volume", in order.
-  std::vector<std::string> playedIn(const std::vector<Step>& steps) {
-    std::vector<std::string> played;
-    for (const auto& summary : summariesOf(stream(steps))) {
-      played.push_back(summary->message.text("play_seconds") + "@" +
-                       summary->message.text("QMSessionVolume"));
-    }
-    return played;
+  std::string shortFormOf(const ValueMap& summary) const override {
+    return summary.text("play_seconds") + "@" + summary.text("QMSessionVolume");
   }
 };
 
@@ -48,7 +38,7 @@ class VolumeMessagesTest : public ProducerTest {
 
 class VolumeStreamTest : public VolumeMessagesTest, public ::testing::WithParamInterface<StreamCase> {};
 
-TEST_P(VolumeStreamTest, IsSummarised) { EXPECT_EQ(playedIn(GetParam().stream), GetParam().expected); }
+TEST_P(VolumeStreamTest, IsSummarised) { EXPECT_EQ(shortFormsOf(GetParam().stream), GetParam().expected); }
 
 const char kRunning[] = "session_output_running";
 const char kVolume[] = "QMSessionVolume";
@@ -169,18 +159,12 @@ TEST_F(VolumeMessagesTest, WhatIsNotKnownHasItsDefault) {
 }
 
 TEST_F(VolumeMessagesTest, SummariesAreNumberedAndCounted) {
-  const auto summaries = summariesOf(
-      stream({{0, {{kRunning, kOn}, {kVolume, 0.5}}}, {3, {{kVolume, 0.8}}}, {10, {{kRunning, kOff}}}}));
-  EXPECT_THAT(textsUnder("msgidx", summaries), ElementsAre("1", "2"));
-  EXPECT_THAT(textsUnder("msgcnt", summaries), ElementsAre("2", "2"));
-  EXPECT_EQ(summaries[0]->message.find("msgcnt")->kind(), Value::Kind::kUnsigned);
+  expectNumbersAndACount(
+      {{0, {{kRunning, kOn}, {kVolume, 0.5}}}, {3, {{kVolume, 0.8}}}, {10, {{kRunning, kOff}}}});
 }
 
 TEST_F(VolumeMessagesTest, PlaySecondsHaveSinglePrecision) {
-  const auto summaries =
-      summariesOf(stream({{0, {{kRunning, kOn}, {kVolume, 0.5}}}, {1.1, {{kRunning, kOff}}}}));
-  ASSERT_THAT(summaries, SizeIs(1));
-  EXPECT_EQ(summaries[0]->message.number("play_seconds"), static_cast<double>(1.1F));
+  expectSinglePrecision({{kRunning, kOn}, {kVolume, 0.5}}, {{kRunning, kOff}}, "play_seconds");
 }
 
 TEST_F(VolumeMessagesTest, WithoutAProcessThereIsNoSummary) {
@@ -191,18 +175,12 @@ TEST_F(VolumeMessagesTest, WithoutAProcessThereIsNoSummary) {
 }
 
 TEST_F(VolumeMessagesTest, WithoutTimesThereIsNoSummary) {
-  EXPECT_THAT(summariesOf({message({{kRunning, kOn}, {kVolume, 0.5}}), messageAt(10, {{kRunning, kOff}})}),
-              IsEmpty());
-  EXPECT_THAT(summariesOf({messageAt(0, {{kRunning, kOn}, {kVolume, 0.5}}), message({{kRunning, kOff}})}),
-              IsEmpty());
-  EXPECT_THAT(summariesOf({messageAt(0, {{kRunning, kOn}, {kVolume, 0.5}}),
-                           messageAt(std::nan(""), {{kRunning, kOff}})}),
-              IsEmpty());
+  expectNoSummaryWithoutTimes({{kRunning, kOn}, {kVolume, 0.5}}, {{kRunning, kOff}});
 }
 
 TEST_F(VolumeMessagesTest, AnOpenStretchInThePreviousValuesYieldsNoSummaryByItself) {
   session->addPreviousValues({{kRunning, kOn}, {kVolume, 0.5}, {"twreporting_timestamp", 0.0}});
-  EXPECT_THAT(playedIn({{10, {{kRunning, kOff}}}}), IsEmpty());
+  EXPECT_THAT(shortFormsOf({{10, {{kRunning, kOff}}}}), IsEmpty());
 }
 
 TEST_F(VolumeMessagesTest, TheWalkBeginsWithThePreviousValues) {
@@ -249,15 +227,12 @@ TEST_F(VolumeMessagesTest, StopSendsTheSummariesIntoTheSession) {
 }
 
 TEST_F(VolumeMessagesTest, AStopWithoutSummariesSendsAndSaysNothing) {
-  session->start();
-  session->stop();
-  EXPECT_THAT(test.metricon.events(), IsEmpty());
-  EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kDefault), IsEmpty());
+  expectNothingOfAStopWithoutSummaries();
 }
 
 TEST_F(VolumeMessagesTest, SaysWhatItDoesWithEachStretch) {
   test.log.clear();
-  playedIn({{0, {{kRunning, kOn}, {kVolume, 0.5}}}, {2, {{kVolume, 0.75}}}, {2.25, {{kRunning, kOff}}}});
+  shortFormsOf({{0, {{kRunning, kOn}, {kVolume, 0.5}}}, {2, {{kVolume, 0.75}}}, {2.25, {{kRunning, kOff}}}});
   EXPECT_THAT(
       test.log.textsOf("twrr", LogLevel::kDebug),
       ElementsAre("entering createVolumeMessages createVolumeMessages",
@@ -266,31 +241,15 @@ TEST_F(VolumeMessagesTest, SaysWhatItDoesWithEachStretch) {
                   "added volume message { func=createVolumeMessages, action=add, count=1 }",
                   StartsWith("playingTime { func=createVolumeMessages, playingTime=0.250000,"),
                   "skipped volume message, too short { func=createVolumeMessages, action=skip, count=1 }"));
-  for (const auto& line : test.log.linesOf("twrr", LogLevel::kDebug)) {
-    EXPECT_THAT(line.message, StartsWith("TWReportingSessionVolumeMessagesWorker:"));
-  }
+  expectDebugLinesOf("TWReportingSessionVolumeMessagesWorker");
 }
 
-// Whatever a stream holds, the walk neither crashes nor reads the clock, and changes the stored messages by
-// nothing but the merging of rapid ones.
 RC_GTEST_FIXTURE_PROP(VolumeMessagesTest, SurvivesAnyStream, ()) {
-  const auto messages = anyStream({kRunning, kVolume, "session_duration", "active_devices",
-                                   "spatializationEnabled", "spatial-audio-accessory-feature", "ringerstate",
-                                   "mFormatID", "session_selected_format", "other"});
-  const auto expected = copiesOf(messages);
-  const std::array<std::string_view, 2> keys{"spatial-audio-accessory-feature", "spatializationEnabled"};
-  TWReportingSessionWorkerUtility::combineRapidMessages(expected, keys, 5.0);
-  const std::uint64_t clockReads = test.clock.wallReads();
-
-  const auto summaries = summariesOf(messages);
-  RC_CLASSIFY(!summaries.empty());
-  RC_ASSERT(test.clock.wallReads() == clockReads);
-  RC_ASSERT(payloadsOf(messages) == payloadsOf(expected));
-  for (const auto& summary : summaries) {
-    RC_ASSERT(summary->message.number("play_seconds") > 0.5);
-    RC_ASSERT(summary->message.size() == 14U);
-    RC_ASSERT(summary->message.integer("msgcnt") == static_cast<std::int64_t>(summaries.size()));
-  }
+  checkAnyStream(
+      {kRunning, kVolume, "session_duration", "active_devices", "spatializationEnabled",
+       "spatial-audio-accessory-feature", "ringerstate", "mFormatID", "session_selected_format", "other"},
+      "play_seconds", [](const auto& messages) { mergeRapidSpatialMessages(messages, 5.0); },
+      [](const TWReportingSessionMessage& summary) { RC_ASSERT(summary.message.size() == 14U); });
 }
 
 }  // namespace
