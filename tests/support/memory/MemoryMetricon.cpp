@@ -9,12 +9,12 @@ void MemoryMetricon::sendEvent(const EventNames& names, const UniqueFunction<Val
   std::vector<std::string> used = usedOf(names);
   if (used.empty()) return;
   const ValueMap made = payload();
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   for (std::string& name : used) events_.push_back({std::move(name), made});
 }
 
 std::vector<std::string> MemoryMetricon::usedOf(const EventNames& names) const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   std::vector<std::string> used;
   for (const SharedString* name : {&names.first, &names.second}) {
     if (!name->empty() && isUsed_(*name)) used.push_back(name->string());
@@ -32,12 +32,12 @@ void MemoryMetricon::useOnly(std::vector<std::string> patterns) {
 }
 
 void MemoryMetricon::useOnly(std::function<bool(std::string_view name)> isUsed) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   isUsed_ = std::move(isUsed);
 }
 
 std::vector<MemoryMetricon::Event> MemoryMetricon::events() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return events_;
 }
 
@@ -56,7 +56,7 @@ std::vector<ValueMap> MemoryMetricon::eventsNamed(std::string_view name) const {
 }
 
 void MemoryMetricon::clear() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   events_.clear();
 }
 

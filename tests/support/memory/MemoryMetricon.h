@@ -2,11 +2,11 @@
 #pragma once
 
 #include <functional>
-#include <mutex>
 #include <string>
 #include <vector>
 
 #include "platform/Metricon.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -37,9 +37,11 @@ class MemoryMetricon final : public Metricon {
  private:
   std::vector<std::string> usedOf(const EventNames& names) const;
 
-  mutable std::mutex mutex_;  // guards all below
-  std::function<bool(std::string_view name)> isUsed_ = [](std::string_view) { return true; };
-  std::vector<Event> events_;
+  mutable Mutex mutex_;
+  std::function<bool(std::string_view name)> isUsed_ GUARDED_BY(mutex_) = [](std::string_view) {
+    return true;
+  };
+  std::vector<Event> events_ GUARDED_BY(mutex_);
 };
 
 }  // namespace tonewerk

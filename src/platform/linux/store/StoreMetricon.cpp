@@ -18,7 +18,7 @@ StoreMetricon::StoreMetricon(ReportStore& store, const PreferenceStore& preferen
 StoreMetricon::~StoreMetricon() = default;
 
 void StoreMetricon::readConsumersAgain() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   isStale_ = true;
 }
 
@@ -29,7 +29,7 @@ void StoreMetricon::sendEvent(const EventNames& names, const UniqueFunction<Valu
 }
 
 EventNames StoreMetricon::usedOf(const EventNames& names) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   readConsumers();
   EventNames used;
   if (isUsed(names.first)) used.first = names.first;

@@ -2,7 +2,6 @@
 #pragma once
 
 #include <chrono>
-#include <mutex>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -10,6 +9,7 @@
 
 #include "platform/Metricon.h"
 #include "platform/linux/store/AnalyticsConsumers.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -50,21 +50,20 @@ class StoreMetricon final : public Metricon {
 
   // Those of the names that somebody asks for; both empty when nobody does.
   EventNames usedOf(const EventNames& names);
-  bool isUsed(const SharedString& name);
-  void readConsumers();
+  bool isUsed(const SharedString& name) REQUIRES(mutex_);
+  void readConsumers() REQUIRES(mutex_);
 
   ReportStore& store_;
   const PreferenceStore& preferences_;
   const Clock& clock_;
   const LogCategory& log_;
 
-  std::mutex mutex_;
-  // Guarded by mutex_.
-  std::optional<AnalyticsConsumers> consumers_;
-  std::optional<Value> preference_;  // what consumers_ was made of
-  std::chrono::nanoseconds readAt_{0};
-  bool isStale_ = true;
-  std::unordered_map<std::string, bool, NameHash, std::equal_to<>> remembered_;
+  Mutex mutex_;
+  std::optional<AnalyticsConsumers> consumers_ GUARDED_BY(mutex_);
+  std::optional<Value> preference_ GUARDED_BY(mutex_);  // what consumers_ was made of
+  std::chrono::nanoseconds readAt_ GUARDED_BY(mutex_){0};
+  bool isStale_ GUARDED_BY(mutex_) = true;
+  std::unordered_map<std::string, bool, NameHash, std::equal_to<>> remembered_ GUARDED_BY(mutex_);
 };
 
 }  // namespace tonewerk

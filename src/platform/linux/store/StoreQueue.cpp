@@ -6,14 +6,17 @@
 namespace tonewerk {
 
 bool StoreQueue::add(StoreRow row) {
-  std::unique_lock lock(mutex_);
+  MutexLock lock(mutex_);
   const std::size_t bytes = bytesOf(row);
   bool heldUp = false;
   if (!fits(bytes) && holds_) {
-    heldUp = !room_.wait_for(lock, limits_.hold, [&] { return fits(bytes) || !holds_; });
+    const auto deadline = std::chrono::steady_clock::now() + limits_.hold;
+    while (!fits(bytes) && holds_ && room_.waitUntil(lock, deadline)) {
+    }
+    heldUp = !fits(bytes) && holds_;
     if (heldUp) {
       holds_ = false;
-      room_.notify_all();
+      room_.notifyAll();
     }
   }
   if (!fits(bytes)) {
@@ -24,33 +27,37 @@ bool StoreQueue::add(StoreRow row) {
   queued_.emplace_back(std::move(row));
   queuedBytes_ += bytes;
   ++added_;
-  if (queued_.size() == 1 || (isUrgent() && !wasUrgent)) work_.notify_one();
+  if (queued_.size() == 1 || (isUrgent() && !wasUrgent)) work_.notifyOne();
   return false;
 }
 
 bool StoreQueue::flush(std::chrono::milliseconds timeout) {
-  std::unique_lock lock(mutex_);
+  MutexLock lock(mutex_);
   const std::uint64_t wanted = added_;
   const std::uint64_t flush = ++lastFlush_;
   ++openFlushes_;
-  work_.notify_one();
-  progress_.wait_for(lock, timeout, [&] { return committed_ >= wanted || failedFlush_ >= flush; });
+  work_.notifyOne();
+  const auto deadline = std::chrono::steady_clock::now() + timeout;
+  while (committed_ < wanted && failedFlush_ < flush && progress_.waitUntil(lock, deadline)) {
+  }
   --openFlushes_;
   return committed_ >= wanted;
 }
 
 void StoreQueue::stop() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   stopped_ = true;
-  work_.notify_one();
+  work_.notifyOne();
 }
 
 bool StoreQueue::take(std::vector<StoreRow>& batch, bool wait) {
   batch.clear();
-  std::unique_lock lock(mutex_);
+  MutexLock lock(mutex_);
   if (wait) {
-    work_.wait(lock, [&] { return !queued_.empty() || stopped_ || nudged_; });
-    work_.wait_for(lock, limits_.gather, [&] { return isUrgent(); });
+    while (queued_.empty() && !stopped_ && !nudged_) work_.wait(lock);
+    const auto deadline = std::chrono::steady_clock::now() + limits_.gather;
+    while (!isUrgent() && work_.waitUntil(lock, deadline)) {
+    }
   }
   nudged_ = false;
   takenBytes_ = 0;
@@ -66,46 +73,48 @@ bool StoreQueue::take(std::vector<StoreRow>& batch, bool wait) {
 }
 
 void StoreQueue::nudge() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   nudged_ = true;
-  work_.notify_all();
+  work_.notifyAll();
 }
 
 void StoreQueue::attempt() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   attemptedFlush_ = lastFlush_;
 }
 
 void StoreQueue::committed() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   committed_ += std::exchange(takenRows_, 0);
   takenBytes_ = 0;
   holds_ = true;
-  room_.notify_all();
-  progress_.notify_all();
+  room_.notifyAll();
+  progress_.notifyAll();
 }
 
 void StoreQueue::failed() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   failedFlush_ = attemptedFlush_;
   holds_ = false;
-  room_.notify_all();
-  progress_.notify_all();
+  room_.notifyAll();
+  progress_.notifyAll();
 }
 
 bool StoreQueue::pause(std::chrono::nanoseconds time) {
-  std::unique_lock lock(mutex_);
-  work_.wait_for(lock, time, [&] { return stopped_ || lastFlush_ > attemptedFlush_; });
+  MutexLock lock(mutex_);
+  const auto deadline = std::chrono::steady_clock::now() + time;
+  while (!stopped_ && lastFlush_ <= attemptedFlush_ && work_.waitUntil(lock, deadline)) {
+  }
   return !stopped_;
 }
 
 std::uint64_t StoreQueue::takeDropped() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return std::exchange(dropped_, 0);
 }
 
 std::uint64_t StoreQueue::lost() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return queued_.size() + takenRows_ + dropped_;
 }
 

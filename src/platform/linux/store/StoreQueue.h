@@ -2,14 +2,13 @@
 #pragma once
 
 #include <chrono>
-#include <condition_variable>
 #include <cstddef>
 #include <cstdint>
 #include <deque>
-#include <mutex>
 #include <vector>
 
 #include "platform/linux/store/StoreRow.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -73,32 +72,31 @@ class StoreQueue {
   std::uint64_t lost() const;
 
  private:
-  bool fits(std::size_t bytes) const;
-  bool isUrgent() const;
+  bool fits(std::size_t bytes) const REQUIRES(mutex_);
+  bool isUrgent() const REQUIRES(mutex_);
 
   const Limits limits_;
-  mutable std::mutex mutex_;
-  std::condition_variable work_;      // for the writer
-  std::condition_variable room_;      // for add()
-  std::condition_variable progress_;  // for flush()
+  mutable Mutex mutex_;
+  Condition work_;      // for the writer
+  Condition room_;      // for add()
+  Condition progress_;  // for flush()
 
-  // All guarded by mutex_.
-  std::deque<StoreRow> queued_;
-  bool leftOver_ = false;  // rows that did not fit into the last batch
-  std::size_t queuedBytes_ = 0;
-  std::size_t takenRows_ = 0;
-  std::size_t takenBytes_ = 0;
-  bool holds_ = true;  // whether add() waits for room
-  bool stopped_ = false;
-  bool nudged_ = false;
-  std::uint64_t added_ = 0;
-  std::uint64_t committed_ = 0;
-  std::uint64_t dropped_ = 0;
+  std::deque<StoreRow> queued_ GUARDED_BY(mutex_);
+  bool leftOver_ GUARDED_BY(mutex_) = false;  // rows that did not fit into the last batch
+  std::size_t queuedBytes_ GUARDED_BY(mutex_) = 0;
+  std::size_t takenRows_ GUARDED_BY(mutex_) = 0;
+  std::size_t takenBytes_ GUARDED_BY(mutex_) = 0;
+  bool holds_ GUARDED_BY(mutex_) = true;  // whether add() waits for room
+  bool stopped_ GUARDED_BY(mutex_) = false;
+  bool nudged_ GUARDED_BY(mutex_) = false;
+  std::uint64_t added_ GUARDED_BY(mutex_) = 0;
+  std::uint64_t committed_ GUARDED_BY(mutex_) = 0;
+  std::uint64_t dropped_ GUARDED_BY(mutex_) = 0;
   // Flushes are numbered. A try that fails disappoints those asked for before it began.
-  std::uint64_t lastFlush_ = 0;
-  std::uint64_t attemptedFlush_ = 0;
-  std::uint64_t failedFlush_ = 0;
-  std::uint64_t openFlushes_ = 0;
+  std::uint64_t lastFlush_ GUARDED_BY(mutex_) = 0;
+  std::uint64_t attemptedFlush_ GUARDED_BY(mutex_) = 0;
+  std::uint64_t failedFlush_ GUARDED_BY(mutex_) = 0;
+  std::uint64_t openFlushes_ GUARDED_BY(mutex_) = 0;
 };
 
 }  // namespace tonewerk
