@@ -2,6 +2,7 @@
 #include "platform/linux/store/ReportStore.h"
 
 #include <algorithm>
+#include <cassert>
 #include <pthread.h>
 #include <utility>
 
@@ -55,7 +56,10 @@ void ReportStore::readBoundsAgain() {
   queue_.nudge();
 }
 
-bool ReportStore::flush(std::chrono::milliseconds timeout) { return queue_.flush(timeout); }
+bool ReportStore::flush(std::chrono::milliseconds timeout) {
+  assert(std::this_thread::get_id() != thread_.get_id());  // which would wait for itself
+  return queue_.flush(timeout);
+}
 
 void ReportStore::run() {
   pthread_setname_np(pthread_self(), "tw-store");
