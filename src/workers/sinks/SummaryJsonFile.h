@@ -45,7 +45,8 @@ class SummaryJsonFile {
  private:
   void openFile();
   // Goes on to the next name while the attempt says that it is taken; the last attempt's error.
-  std::error_code withFreeName(const std::function<std::error_code(const std::string& name)>& attempt);
+  [[nodiscard]] std::error_code withFreeName(
+      const std::function<std::error_code(const std::string& name)>& attempt);
   void writeLine(std::string_view text);
 
   const std::string directory_;

@@ -21,7 +21,7 @@ class AnalyticsTable {
   AnalyticsTable(SqliteDatabase& database, const JsonService& json);
 
   // False on failure; the database says which.
-  bool insert(const AnalyticsRow& row);
+  [[nodiscard]] bool insert(const AnalyticsRow& row);
 
  private:
   // Combinations of names are remembered up to this number, then anew.
@@ -33,9 +33,9 @@ class AnalyticsTable {
     }
   };
 
-  std::optional<std::int64_t> nameSet(const EventNames& names);
-  std::optional<std::int64_t> findNameSet(const EventNames& names, bool& failed);
-  std::optional<std::int64_t> insertNameSet(const EventNames& names);
+  [[nodiscard]] std::optional<std::int64_t> nameSet(const EventNames& names);
+  [[nodiscard]] std::optional<std::int64_t> findNameSet(const EventNames& names, bool& failed);
+  [[nodiscard]] std::optional<std::int64_t> insertNameSet(const EventNames& names);
 
   SqliteDatabase& database_;
   const JsonService& json_;

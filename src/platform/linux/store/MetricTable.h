@@ -13,7 +13,7 @@ class MetricTable {
   explicit MetricTable(SqliteDatabase& database);
 
   // False on failure; the database says which.
-  bool insert(const MetricRow& row);
+  [[nodiscard]] bool insert(const MetricRow& row);
 
  private:
   SqliteStatement insertRow_;

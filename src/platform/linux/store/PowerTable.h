@@ -15,7 +15,7 @@ class PowerTable {
   PowerTable(SqliteDatabase& database, const JsonService& json);
 
   // False on failure; the database says which.
-  bool insert(const PowerRow& row);
+  [[nodiscard]] bool insert(const PowerRow& row);
 
  private:
   const JsonService& json_;

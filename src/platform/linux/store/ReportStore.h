@@ -58,7 +58,7 @@ class ReportStore {
 
   // Any thread but the work of JsonService, preferences and log. Returns when everything recorded before is
   // in the file; false when it cannot be written or `timeout` passed.
-  bool flush(std::chrono::milliseconds timeout);
+  [[nodiscard]] bool flush(std::chrono::milliseconds timeout);
 
  private:
   // Keeps the preferences from being read for each batch.
@@ -67,10 +67,10 @@ class ReportStore {
   static constexpr std::chrono::milliseconds kLongestBackOff{30'000};
 
   void run();
-  bool writeUntilDone();
-  bool write();
-  StoreDatabase::Result writeOrBeginAnew();
-  bool moveAside();
+  [[nodiscard]] bool writeUntilDone();
+  [[nodiscard]] bool write();
+  [[nodiscard]] StoreDatabase::Result writeOrBeginAnew();
+  [[nodiscard]] bool moveAside();
   void trim();
   void readBounds();
   double bound(std::string_view key, double otherwise, std::string& wrong) const;

@@ -28,14 +28,14 @@ class RtcTable {
   ~RtcTable();
 
   // False on failure; the database says which.
-  bool insert(const RtcSessionRow& row);
-  bool insert(const RtcMessageRow& row);
+  [[nodiscard]] bool insert(const RtcSessionRow& row);
+  [[nodiscard]] bool insert(const RtcMessageRow& row);
   // What was inserted is in the file.
   void committed();
 
  private:
   bool has(const RtcSessionRecord& session) const;
-  bool insertSession(const std::shared_ptr<RtcSessionRecord>& session);
+  [[nodiscard]] bool insertSession(const std::shared_ptr<RtcSessionRecord>& session);
 
   SqliteDatabase& database_;
   const JsonService& json_;

@@ -29,16 +29,16 @@ class SqliteDatabase {
 
   // On failure it is closed; the failure can still be asked for. `patience` is how long a statement waits for
   // another process's lock.
-  bool open(const std::string& path, Mode mode, std::chrono::milliseconds patience);
+  [[nodiscard]] bool open(const std::string& path, Mode mode, std::chrono::milliseconds patience);
   // Statements of this database must be gone.
   void close();
   bool isOpen() const { return isOpen_; }
 
   // One or more statements whose rows nobody wants.
-  bool run(const std::string& sql);
-  SqliteStatement prepare(const std::string& sql);
+  [[nodiscard]] bool run(const std::string& sql);
+  [[nodiscard]] SqliteStatement prepare(const std::string& sql);
   // The first column of the first row; none on failure and without a row.
-  std::optional<std::int64_t> number(const std::string& sql);
+  [[nodiscard]] std::optional<std::int64_t> number(const std::string& sql);
 
   // Rows touched by the last statement.
   std::int64_t changes() const;

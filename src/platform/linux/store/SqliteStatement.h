@@ -33,11 +33,11 @@ class SqliteStatement {
   void bindBytes(int parameter, std::string_view bytes);
   void bindNull(int parameter);
 
-  Step step();
+  [[nodiscard]] Step step();
   // Makes it ready for the next use; what was bound stays bound.
   void reset();
   // For a statement without rows: step and reset. False on failure.
-  bool run();
+  [[nodiscard]] bool run();
 
   // Columns of the current row, from 0.
   std::int64_t integer(int column) const;

@@ -111,9 +111,10 @@ bool StoreDatabase::prepareFile() {
 void StoreDatabase::applyBounds() {
   const std::int64_t pageBytes = database_.number("PRAGMA page_size").value_or(4096);
   const std::int64_t bytes = bounds_.walBytes();
-  // A checkpoint at half of it leaves room for the batches that come in meanwhile.
-  database_.run("PRAGMA wal_autocheckpoint = " + std::to_string(bytes / 2 / pageBytes) +
-                "; PRAGMA journal_size_limit = " + std::to_string(bytes));
+  // A checkpoint at half of it leaves room for the batches that come in meanwhile. A failure only leaves the log longer
+  // than it should be; a file that cannot be used shows it in the next write.
+  (void)database_.run("PRAGMA wal_autocheckpoint = " + std::to_string(bytes / 2 / pageBytes) +
+                      "; PRAGMA journal_size_limit = " + std::to_string(bytes));
 }
 
 StoreDatabase::Result StoreDatabase::resultOf(StoreTrimmer::Outcome outcome, bool& moreToDo) {
@@ -124,14 +125,18 @@ StoreDatabase::Result StoreDatabase::resultOf(StoreTrimmer::Outcome outcome, boo
 
 StoreDatabase::Result StoreDatabase::fail() {
   const Result result = database_.isCorrupt() ? Result::kCorrupt : Result::kFailed;
-  failWith(database_.problem());
+  closeWith(database_.problem());
   return result;
 }
 
 StoreDatabase::Result StoreDatabase::failWith(std::string problem) {
+  closeWith(std::move(problem));
+  return Result::kFailed;
+}
+
+void StoreDatabase::closeWith(std::string problem) {
   problem_ = std::move(problem);
   close();
-  return Result::kFailed;
 }
 
 void StoreDatabase::close() {

@@ -33,33 +33,34 @@ class StoreDatabase {
 
   // All rows, or none of them. The rows are with the operating system afterwards; a power cut may take the
   // last ones.
-  Result write(std::span<const StoreRow> rows);
+  [[nodiscard]] Result write(std::span<const StoreRow> rows);
   // What the next trims and the write-ahead log keep to.
   void setBounds(const StoreBounds& bounds);
   // A slice of deleting what is too old at `now`, or of keeping the file's size; `moreToDo` asks for another.
   // Nothing to do while it is closed.
-  Result trimAge(double now, bool& moreToDo);
-  Result trimSize(bool& moreToDo);
+  [[nodiscard]] Result trimAge(double now, bool& moreToDo);
+  [[nodiscard]] Result trimSize(bool& moreToDo);
   // Renames the file and what belongs to it to "<path>.corrupt...", over those of an earlier time. False,
   // with a problem(), when it cannot.
-  bool moveAside();
+  [[nodiscard]] bool moveAside();
 
   const std::string& path() const { return path_; }
   // What the last failure was.
   const std::string& problem() const { return problem_; }
 
  private:
-  Result open();
-  bool prepareFile();
-  bool insert(const AnalyticsRow& row);
-  bool insert(const MetricRow& row);
-  bool insert(const PowerRow& row);
-  bool insert(const RtcSessionRow& row);
-  bool insert(const RtcMessageRow& row);
+  [[nodiscard]] Result open();
+  [[nodiscard]] bool prepareFile();
+  [[nodiscard]] bool insert(const AnalyticsRow& row);
+  [[nodiscard]] bool insert(const MetricRow& row);
+  [[nodiscard]] bool insert(const PowerRow& row);
+  [[nodiscard]] bool insert(const RtcSessionRow& row);
+  [[nodiscard]] bool insert(const RtcMessageRow& row);
   void applyBounds();
-  Result resultOf(StoreTrimmer::Outcome outcome, bool& moreToDo);
-  Result fail();
-  Result failWith(std::string problem);
+  [[nodiscard]] Result resultOf(StoreTrimmer::Outcome outcome, bool& moreToDo);
+  [[nodiscard]] Result fail();
+  [[nodiscard]] Result failWith(std::string problem);
+  void closeWith(std::string problem);
   void close();
 
   const std::string directory_;

@@ -40,11 +40,11 @@ class StoreQueue {
   explicit StoreQueue(const Limits& limits) : limits_(limits) {}
 
   // Any thread. Returns true when this row begins a time of dropping because of the hold time.
-  bool add(StoreRow row);
+  [[nodiscard]] bool add(StoreRow row);
 
   // Any thread. Waits until everything added before is committed; false when the first try to write that
   // began after the call fails, or after `timeout`.
-  bool flush(std::chrono::milliseconds timeout);
+  [[nodiscard]] bool flush(std::chrono::milliseconds timeout);
 
   // Any thread. The next take() does not wait for rows, or one that waits comes back, perhaps with none.
   void nudge();
@@ -54,7 +54,7 @@ class StoreQueue {
 
   // The writer's thread. Replaces `batch`, whose rows are committed, by the next rows. Without `wait` it
   // comes back at once, perhaps with none. False when stopped and empty.
-  bool take(std::vector<StoreRow>& batch, bool wait);
+  [[nodiscard]] bool take(std::vector<StoreRow>& batch, bool wait);
   // A try to write what was taken begins.
   void attempt();
   // The rows taken are in the file.
@@ -63,10 +63,10 @@ class StoreQueue {
   void failed();
   // Returns after `time` or when flush() or stop() ask for another try. False when stopped: that try is the
   // last.
-  bool pause(std::chrono::nanoseconds time);
+  [[nodiscard]] bool pause(std::chrono::nanoseconds time);
 
   // The number of rows dropped since the last time.
-  std::uint64_t takeDropped();
+  [[nodiscard]] std::uint64_t takeDropped();
   // Rows that are not committed, and those dropped since the last takeDropped(): what is lost when nobody
   // writes any more.
   std::uint64_t lost() const;

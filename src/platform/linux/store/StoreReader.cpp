@@ -155,7 +155,7 @@ bool StoreReader::readRows(const std::string& sql, const EventFilter& filter,
       case SqliteStatement::Step::kDone:
         return true;
       case SqliteStatement::Step::kFailed:
-        fail(database_.problem());
+        problem_ = path_ + ": " + database_.problem();
         return false;
     }
   }

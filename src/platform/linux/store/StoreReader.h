@@ -74,25 +74,27 @@ class StoreReader {
   enum class Outcome { kDone, kNoStore, kFailed };
 
   // The store in `directory`. kNoStore when there is none, or none with anything in it yet.
-  Outcome open(const std::string& directory);
+  [[nodiscard]] Outcome open(const std::string& directory);
 
   // Every event that passes, oldest first. False on failure.
-  bool readEvents(const EventFilter& filter, const std::function<void(const StoredEvent& event)>& take);
+  [[nodiscard]] bool readEvents(const EventFilter& filter,
+                                const std::function<void(const StoredEvent& event)>& take);
 
-  bool readPowerEvents(const EventFilter& filter,
-                       const std::function<void(const StoredPowerEvent& event)>& take);
+  [[nodiscard]] bool readPowerEvents(const EventFilter& filter,
+                                     const std::function<void(const StoredPowerEvent& event)>& take);
   // Of the power events that pass, the application with the longest time first.
-  bool readEngineOnTotals(const EventFilter& filter,
-                          const std::function<void(const EngineOnTotal& total)>& take);
+  [[nodiscard]] bool readEngineOnTotals(const EventFilter& filter,
+                                        const std::function<void(const EngineOnTotal& total)>& take);
 
   // Metrics have no name to choose by.
-  bool readMetrics(const EventFilter& filter, const std::function<void(const StoredMetric& metric)>& take);
+  [[nodiscard]] bool readMetrics(const EventFilter& filter,
+                                 const std::function<void(const StoredMetric& metric)>& take);
 
   // A name is that of the session's service, as "telephony_session".
-  bool readRtcSessions(const EventFilter& filter,
-                       const std::function<void(const StoredRtcSession& session)>& take);
-  bool readRtcMessages(const EventFilter& filter,
-                       const std::function<void(const StoredRtcMessage& message)>& take);
+  [[nodiscard]] bool readRtcSessions(const EventFilter& filter,
+                                     const std::function<void(const StoredRtcSession& session)>& take);
+  [[nodiscard]] bool readRtcMessages(const EventFilter& filter,
+                                     const std::function<void(const StoredRtcMessage& message)>& take);
 
   // Whether another file has taken the place of the one opened.
   bool hasMoved() const { return database_.hasMoved(); }
@@ -101,10 +103,10 @@ class StoreReader {
 
  private:
   // Runs `take` at each row of a query with the filter's parameters.
-  bool readRows(const std::string& sql, const EventFilter& filter,
-                const std::function<void(const SqliteStatement& row)>& take);
-  Outcome openAs(SqliteDatabase::Mode mode);
-  Outcome fail(const std::string& problem);
+  [[nodiscard]] bool readRows(const std::string& sql, const EventFilter& filter,
+                              const std::function<void(const SqliteStatement& row)>& take);
+  [[nodiscard]] Outcome openAs(SqliteDatabase::Mode mode);
+  [[nodiscard]] Outcome fail(const std::string& problem);
 
   std::string path_;
   SqliteDatabase database_;

@@ -35,17 +35,17 @@ class StoreTrimmer {
   explicit StoreTrimmer(SqliteDatabase& database) : database_(database) {}
 
   // One slice of keeping to the time bound; `now` in seconds since 1970. On failure the database says why.
-  Outcome trimAge(const StoreBounds& bounds, double now);
+  [[nodiscard]] Outcome trimAge(const StoreBounds& bounds, double now);
   // The same of keeping to the size bound. Cheap when there is nothing to do: for every batch.
-  Outcome trimSize(const StoreBounds& bounds);
+  [[nodiscard]] Outcome trimSize(const StoreBounds& bounds);
 
  private:
-  Outcome deleteForSize(std::int64_t fileBytes);
-  Outcome vacuum(std::int64_t fileBytes);
-  bool measure();
-  std::int64_t deleteUpTo(double time);
-  std::int64_t deleteOldest(std::int64_t bytes);
-  std::optional<bool> emptyNewest(std::int64_t mostBytes);
+  [[nodiscard]] Outcome deleteForSize(std::int64_t fileBytes);
+  [[nodiscard]] Outcome vacuum(std::int64_t fileBytes);
+  [[nodiscard]] bool measure();
+  [[nodiscard]] std::int64_t deleteUpTo(double time);
+  [[nodiscard]] std::int64_t deleteOldest(std::int64_t bytes);
+  [[nodiscard]] std::optional<bool> emptyNewest(std::int64_t mostBytes);
 
   SqliteDatabase& database_;
   std::int64_t pageBytes_ = 0;

@@ -31,8 +31,8 @@ class StoreQueueTest : public testing::Test {
 };
 
 TEST_F(StoreQueueTest, MakesWhoAddsWaitUntilThereIsRoom) {
-  queue_.add(row(0));
-  queue_.add(row(1));
+  EXPECT_FALSE(queue_.add(row(0)));
+  EXPECT_FALSE(queue_.add(row(1)));
   auto third = std::async(std::launch::async, [&] { return queue_.add(row(2)); });
   ASSERT_TRUE(queue_.take(batch_, true));
   EXPECT_THAT(batch_, SizeIs(2));
@@ -45,22 +45,22 @@ TEST_F(StoreQueueTest, MakesWhoAddsWaitUntilThereIsRoom) {
 }
 
 TEST_F(StoreQueueTest, CountsRowsUntilTheyAreCommitted) {
-  queue_.add(row(0));
-  queue_.add(row(1));
+  EXPECT_FALSE(queue_.add(row(0)));
+  EXPECT_FALSE(queue_.add(row(1)));
   ASSERT_TRUE(queue_.take(batch_, true));
   queue_.failed();
-  queue_.add(row(2));
+  EXPECT_FALSE(queue_.add(row(2)));
   EXPECT_EQ(queue_.lost(), 3U);
   EXPECT_EQ(queue_.takeDropped(), 1U);
   queue_.committed();
-  queue_.add(row(3));
+  EXPECT_FALSE(queue_.add(row(3)));
   ASSERT_TRUE(queue_.take(batch_, true));
   EXPECT_THAT(batch_, SizeIs(1));
 }
 
 TEST_F(StoreQueueTest, LetsWhoWaitsGoWhenWritingFails) {
-  queue_.add(row(0));
-  queue_.add(row(1));
+  EXPECT_FALSE(queue_.add(row(0)));
+  EXPECT_FALSE(queue_.add(row(1)));
   auto third = std::async(std::launch::async, [&] { return queue_.add(row(2)); });
   ASSERT_TRUE(queue_.take(batch_, true));
   queue_.failed();
@@ -73,7 +73,7 @@ TEST_F(StoreQueueTest, TakesARowLargerThanAllItsRoomAlone) {
   StoreQueue::Limits limits = small();
   limits.bytes = 10;
   StoreQueue queue(limits);
-  queue.add(row(0));
+  EXPECT_FALSE(queue.add(row(0)));
   ASSERT_TRUE(queue.take(batch_, true));
   EXPECT_THAT(batch_, SizeIs(1));
 }
@@ -82,8 +82,8 @@ TEST_F(StoreQueueTest, HoldsNobodyLongerThanTheHoldTimeAndSaysSoOnce) {
   StoreQueue::Limits limits = small();
   limits.hold = milliseconds(1);
   StoreQueue queue(limits);
-  queue.add(row(0));
-  queue.add(row(1));
+  EXPECT_FALSE(queue.add(row(0)));
+  EXPECT_FALSE(queue.add(row(1)));
   EXPECT_TRUE(queue.add(row(2)));
   EXPECT_FALSE(queue.add(row(3)));
   ASSERT_TRUE(queue.take(batch_, true));
@@ -92,7 +92,7 @@ TEST_F(StoreQueueTest, HoldsNobodyLongerThanTheHoldTimeAndSaysSoOnce) {
 }
 
 TEST_F(StoreQueueTest, FlushEndsWithTheCommit) {
-  queue_.add(row(0));
+  EXPECT_FALSE(queue_.add(row(0)));
   auto flushed = std::async(std::launch::async, [&] { return queue_.flush(kLongEnough); });
   ASSERT_TRUE(queue_.take(batch_, true));
   queue_.attempt();
@@ -101,7 +101,7 @@ TEST_F(StoreQueueTest, FlushEndsWithTheCommit) {
 }
 
 TEST_F(StoreQueueTest, FlushIsTriedOnceMoreBeforeItFails) {
-  queue_.add(row(0));
+  EXPECT_FALSE(queue_.add(row(0)));
   ASSERT_TRUE(queue_.take(batch_, true));
   queue_.attempt();
   queue_.failed();
@@ -113,14 +113,14 @@ TEST_F(StoreQueueTest, FlushIsTriedOnceMoreBeforeItFails) {
 }
 
 TEST_F(StoreQueueTest, FlushGivesUpAfterItsTime) {
-  queue_.add(row(0));
+  EXPECT_FALSE(queue_.add(row(0)));
   EXPECT_FALSE(queue_.flush(milliseconds(1)));
 }
 
 TEST_F(StoreQueueTest, FlushOfNothingIsDone) { EXPECT_TRUE(queue_.flush(kLongEnough)); }
 
 TEST_F(StoreQueueTest, GivesWhatIsLeftBeforeItStops) {
-  queue_.add(row(0));
+  EXPECT_FALSE(queue_.add(row(0)));
   queue_.stop();
   EXPECT_TRUE(queue_.take(batch_, true));
   EXPECT_THAT(batch_, SizeIs(1));
