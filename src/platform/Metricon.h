@@ -30,9 +30,10 @@ class Metricon {
  public:
   virtual ~Metricon() = default;
 
-  // Records an event under those of its names that a consumer has asked for, the first name first. `payload` is
-  // called once, before sendEvent() returns, and not at all when nobody has asked for any of the names. May wait
-  // while the recorder's queue is full (see docs/architecture.md, "Back pressure").
+  // Records an event under those of its names that a consumer has asked for, the first name first. `payload`
+  // is called once, before sendEvent() returns, and not at all when nobody has asked for any of the names.
+  // Waits while the recorder's queue is full, unless nothing can be written (see docs/architecture.md, "Back
+  // pressure").
   virtual void sendEvent(const EventNames& names, const UniqueFunction<ValueMap()>& payload) = 0;
 };
 

@@ -103,8 +103,8 @@ std::optional<ValueMap> IntervalWalk::summaryUntil(const std::optional<Value>& e
   return summaryOf({*seconds, static_cast<std::int32_t>(summaries_.size()) + 1});
 }
 
-// The length of the current interval in seconds. None when it is too short, when one of its times is missing, or when
-// the length is no number.
+// The length of the current interval in seconds. None when it is too short, when one of its times is missing,
+// or when the length is not a number.
 std::optional<double> IntervalWalk::measure(const std::optional<Value>& end) const {
   const double length = numberOrZero(end) - numberOrZero(begin_);
   debugLog(site_,
@@ -112,7 +112,8 @@ std::optional<double> IntervalWalk::measure(const std::optional<Value>& end) con
            "startTwTimestamp_double=%f }",
            kind_.length, kind_.function, kind_.length, length, end, numberOrZero(end), begin_,
            numberOrZero(begin_));
-  const bool isLongEnough = begin_ && end && length > minimumSeconds_;  // false when the length is no number
+  const bool isLongEnough =
+      begin_ && end && length > minimumSeconds_;  // false when the length is not a number
   return isLongEnough ? std::optional<double>(length) : std::nullopt;
 }
 

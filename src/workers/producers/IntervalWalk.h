@@ -11,16 +11,16 @@
 
 namespace tonewerk {
 
-// Folds a session's stored messages into summaries, one for each interval in which output or input ran under the
-// same conditions.
+// Folds a session's stored messages into summaries, one for each interval in which output or input ran under
+// the same conditions.
 //
 //   running      |-----------------------------|
 //   conditions   A ............ B ..............
 //   intervals    |----- A -----||----- B ------|
 //
-// The walk keeps the latest value of every key, finds where intervals begin and end, leaves out those that are too
-// short, numbers and counts the summaries, and logs what it does. A producer derives from it and says which changes
-// end an interval and what a summary holds. An object walks once, on the work queue.
+// The walk keeps the latest value of every key, finds where intervals begin and end, leaves out those that
+// are too short, numbers and counts the summaries, and logs what it does. A producer derives from it and says
+// which changes end an interval and what a summary holds. An object walks once, on the work queue.
 class IntervalWalk {
  public:
   // What happens to an interval that the previous values show as running.
@@ -50,9 +50,9 @@ class IntervalWalk {
     Value bucketedLength() const;
   };
 
-  // `site` is the producer's source file and line, which the log lines carry. Intervals of `minimumSeconds` or less
-  // are too short. The walk's state begins with `defaults`, and then the session's previous values. The texts of
-  // `kind` outlive the walk.
+  // `site` is the producer's source file and line, which the log lines carry. Intervals of `minimumSeconds`
+  // or less are too short. The walk's state begins with `defaults` and then the session's previous values.
+  // The texts of `kind` outlive the walk.
   IntervalWalk(const Kind& kind, const LogSite& site, double minimumSeconds, ValueMap defaults,
                const ValueMap& previousValues);
   IntervalWalk(const IntervalWalk&) = delete;
@@ -63,21 +63,22 @@ class IntervalWalk {
   TWReportingSessionMessages summariesOf(const TWReportingSessionMessages& messages);
 
  protected:
-  // The latest value of every key, before the message that is looked at.
+  // The latest value of every key, before the message that is being looked at.
   const ValueMap& state() const { return state_; }
-  // The same of one key that the defaults have.
+  // The latest value of one key, which must be among the defaults.
   Value current(std::string_view key) const { return *state_.find(key); }
-  // Whether state and message both have the key, with different texts.
+  // Whether the state and the message both have the key, with different texts.
   bool changesText(const ValueMap& message, std::string_view key) const;
 
  private:
-  // Whether a message that says "running" for the first time begins an interval.
+  // Whether a message that starts output or input begins an interval.
   virtual bool begins(const ValueMap& /*message*/) const { return true; }
   // Whether a message ends the interval although output or input still runs.
   virtual bool endsInterval(const ValueMap& message) const = 0;
   // Called for each message while output or input runs, before the message ends an interval.
   virtual void collect(const ValueMap& /*message*/) {}
-  // What state() says of an interval that is long enough. None when it yields no summary.
+  // The summary of an interval that is long enough. state() is still what it was before the message that ends
+  // it. None when the interval yields no summary.
   virtual std::optional<ValueMap> summaryOf(const Interval& interval) = 0;
 
   void step(const ValueMap& message);

@@ -40,7 +40,7 @@ class GatherWalk final : public IntervalWalk {
   bool begins(const ValueMap& message) const override { return isInGather(message); }
 
   bool endsInterval(const ValueMap& message) const override {
-    // Another start of output outside a Gather session ends an interval that was in one.
+    // A further start of output that is not in a Gather session ends an interval that is in one.
     if (message.contains(TWReportingMessageKeySessionOutputRunning) && isInGather(state()) &&
         !isInGather(message)) {
       return true;
@@ -49,7 +49,7 @@ class GatherWalk final : public IntervalWalk {
         changesText(message, TWReportingMessageKeyActiveDevices)) {
       return true;
     }
-    // Leaving a Gather session ends nothing here. A 0 ends an interval that was in none.
+    // A 0 without a start of output ends no interval in a Gather session. It ends one that is in none.
     const Value* gather = message.find(TWReportingMessageKeyGatherSession);
     return gather != nullptr && gather->integer() == 0 && !isInGather(state());
   }

@@ -8,19 +8,20 @@
 
 namespace tonewerk {
 
-// Folds a session's messages, when it stops, into gather summaries: one for each stretch of output within a
-// Gather session (listening together), telling how long was played, with which format on which devices.
+// Folds a session's messages, when it stops, into gather summaries. There is one for each interval of output
+// in a Gather session (listening together). It says how long was played, and with which format on which
+// devices.
 //
 //   output running   |----------------------------|     |------|
 //   gather_session   1 ...............................  0 ......
 //   active devices   A ......... B ...............
 //   summaries        |--- A ----||------- B ------|
 //
-// A stretch begins with a start of output that says "gather_session" 1. It closes with output, with the
-// session, when the selected format or the active devices change, or when a start of output no longer says 1.
-// A message that says 0 without a word on output does not close it.
+// An interval begins with a start of output that says "gather_session" 1. It ends when output or the session
+// ends, when the selected format or the active devices change, or with a start of output that does not say 1.
+// A message that says 0 and nothing about output does not end it.
 //
-// Summaries go to the analytics and the JSON file workers only.
+// Only the analytics and the JSON file workers get the summaries.
 class TWReportingSessionGatherMessagesWorker final : public TWReportingSessionWorkerProducerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
@@ -30,11 +31,11 @@ class TWReportingSessionGatherMessagesWorker final : public TWReportingSessionWo
     session = owner;
   }
 
-  // Sends the session its summaries.
+  // Sends the summaries into the session.
   void stop() override;
 
-  // The summaries of `messages`, in order. Stretches of `minimumPlaytime` seconds or less are left out.
-  // Changes no message.
+  // The summaries of `messages`, in order. Intervals of `minimumPlaytime` seconds or less are left out. The
+  // messages are not changed.
   TWReportingSessionMessages createGatherMessages(const TWReportingSessionMessages& messages,
                                                   double minimumPlaytime) const;
 };

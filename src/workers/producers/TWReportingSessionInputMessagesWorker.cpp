@@ -19,9 +19,9 @@ namespace {
 
 constexpr std::array<std::string_view, 2> kKeysToCombine{TWReportingMessageKeySpatialAudioAccessoryFeature,
                                                          TWReportingMessageKeySpatializationEnabled};
-constexpr double kMaxPauseSeconds = 2.0;  // less than for volume summaries, on purpose
-// An interval that the previous values show as running has no begin: what they say of input stays, so the first
-// message finds it running.
+constexpr double kMaxPauseSeconds = 2.0;  // intentionally less than for volume summaries
+// When the previous values show input running, that interval has no begin. The state keeps what they say, so
+// the first message finds input running.
 constexpr IntervalWalk::Kind kKind{.runningKey = TWReportingMessageKeySessionInputRunning,
                                    .openInterval = IntervalWalk::OpenInterval::kNoBegin,
                                    .category = kCategoryInput,
@@ -29,7 +29,7 @@ constexpr IntervalWalk::Kind kKind{.runningKey = TWReportingMessageKeySessionInp
                                    .subject = "input",
                                    .length = "runningTime"};
 
-// A sample rate below 1: no vocoder runs.
+// A sample rate that begins so is below 1: no vocoder runs.
 constexpr std::string_view kNoRate = "0.";
 
 ValueMap defaultState() {
@@ -89,7 +89,7 @@ class InputWalk final : public IntervalWalk {
   }
 
   const SharedString* process_;     // null gives no summaries
-  std::set<std::string> vocoders_;  // changed to since the last summary, each as "name:rate"
+  std::set<std::string> vocoders_;  // the new vocoders since the last summary, each as "name:rate"
 };
 
 }  // namespace

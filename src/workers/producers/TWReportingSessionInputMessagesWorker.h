@@ -8,16 +8,18 @@
 
 namespace tonewerk {
 
-// Folds a session's messages, when it stops, into input summaries: one for each stretch of input on the same
-// active devices, telling how long it ran, with which voice processing and through which vocoders.
+// Folds a session's messages, when it stops, into input summaries. There is one for each interval of input on
+// the same active devices. It says how long input ran, with which voice processing and through which
+// vocoders.
 //
 //   running          |-----------------------------|
 //   active devices   A ............ B ..............
 //   vocoder          evs ... amr ...................
 //   summaries        |-- A, amr:8k -||----- B -----|
 //
-// Only the active devices are compared. A vocoder's change closes nothing; it is listed in the summary of the
-// stretch that it came in, with its sample rate. The vocoder that was in use before is not.
+// Only the active devices are compared. A change of the vocoder ends no interval. The new vocoder is listed,
+// with its sample rate, in the summary of the interval in which it changed. The vocoder that was in use
+// before is not listed.
 class TWReportingSessionInputMessagesWorker final : public TWReportingSessionWorkerProducerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
@@ -27,12 +29,12 @@ class TWReportingSessionInputMessagesWorker final : public TWReportingSessionWor
     session = owner;
   }
 
-  // Sends the session its summaries.
+  // Sends the summaries into the session.
   void stop() override;
 
-  // The summaries of `messages`, in order, for the application `process` (null gives none). Stretches of
-  // `minimumRunningtime` seconds or less are left out; what they listed goes to the next summary. Merges
-  // messages that follow one another rapidly, in place.
+  // The summaries of `messages`, in order, for the application `process`; null gives no summaries. Intervals
+  // of `minimumRunningtime` seconds or less are left out, and their vocoders are listed in the next summary.
+  // Merges messages that follow one another rapidly, in place.
   TWReportingSessionMessages createInputMessages(const TWReportingSessionMessages& messages,
                                                  const SharedString* process,
                                                  double minimumRunningtime) const;

@@ -7,14 +7,14 @@
 
 namespace tonewerk {
 
-// Would derive messages on how the device was held. Switched off: no session gets one, and it is in no
-// registry.
+// Would derive messages about how the device was held. It is switched off: no session gets one, and the
+// registry does not list the class.
 class TWReportingSessionOrientationMessagesWorker final : public TWReportingSessionWorkerProducerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
   const TWReportingSessionWorkerClass& workerClass() const override { return kWorkerClass; }
 
-  // Always null; keeps no reference to the session.
+  // Always null. Keeps no reference to the session.
   static std::shared_ptr<TWReportingSessionOrientationMessagesWorker> initWithSession(
       const std::shared_ptr<TWReportingSession>& session);
 };

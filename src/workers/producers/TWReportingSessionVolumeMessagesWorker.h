@@ -8,16 +8,17 @@
 
 namespace tonewerk {
 
-// Folds a session's messages, when it stops, into volume summaries: one for each stretch of output during
-// which the playback context stayed the same, telling how long was played how loud, with which format on
-// which devices.
+// Folds a session's messages, when it stops, into volume summaries. There is one for each interval of output
+// in which the playback context stayed the same. It says how long was played at which volume, and with which
+// format on which devices.
 //
 //   running          |-----------------------------|
 //   volume           0.5 ........ 0.8 .............
 //   summaries        |--- 0.5 ---||----- 0.8 ------|
 //
-// Selected format, active devices, spatialisation, ringer state and volume are compared; format identifier,
-// channels and the spatial accessory feature are carried along.
+// The selected format, the active devices, spatialisation, the ringer state and the volume are compared. The
+// summary also holds the format identifier, the channels and the spatial accessory feature, which are not
+// compared.
 class TWReportingSessionVolumeMessagesWorker final : public TWReportingSessionWorkerProducerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
@@ -27,11 +28,11 @@ class TWReportingSessionVolumeMessagesWorker final : public TWReportingSessionWo
     session = owner;
   }
 
-  // Sends the session its summaries.
+  // Sends the summaries into the session.
   void stop() override;
 
-  // The summaries of `messages`, in order, for the application `process` (null gives none). Stretches of
-  // `minimumPlaytime` seconds or less are left out. Merges messages that follow one another rapidly, in
+  // The summaries of `messages`, in order, for the application `process`; null gives no summaries. Intervals
+  // of `minimumPlaytime` seconds or less are left out. Merges messages that follow one another rapidly, in
   // place.
   TWReportingSessionMessages createVolumeMessages(const TWReportingSessionMessages& messages,
                                                   const SharedString* process, double minimumPlaytime) const;

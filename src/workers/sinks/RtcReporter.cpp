@@ -67,7 +67,7 @@ ValueMap RtcReporter::userInfoOf(const Start& start) {
   return info;
 }
 
-// The wait occupies the queue, not the thread: other sessions' queues run on it.
+// The wait holds the queue, not the thread: the queues of other sessions run on it.
 void RtcReporter::waitForBackends() {
   const std::uint64_t run = ++run_;
   hasAnswer_ = false;
@@ -96,7 +96,7 @@ void RtcReporter::waitForBackends() {
       });
 }
 
-// An answer that comes after the time-out still opens the way for what follows.
+// An answer after the time-out still lets later messages be sent.
 void RtcReporter::takeBackends(std::uint64_t run, const LinkReportSession::Backends& backends) {
   if (run != run_ || linkReportSession_ == nullptr) return;
   hasAnswer_ = true;

@@ -16,18 +16,19 @@ namespace tonewerk {
 class Strand;
 class Timer;
 
-// What a real-time-communication worker does on its private queue: it alone touches the service's session.
+// Does a real-time-communication worker's work with the reporting service, on the worker's private queue.
+// Nothing else uses the service's session.
 //
 //   start() -> waits for backends, at most kBackendTimeout; the queue is held meanwhile
-//           -> sends, or says of every message that the session never started
+//           -> sends messages, or logs for each message that the session never started
 //   stop()  -> summary, flush, end of the service's session
 //
-// Lives on while its queue has work, also when the worker and its session are gone.
+// It lives as long as its queue has work, even when the worker and its session are gone.
 class RtcReporter : public std::enable_shared_from_this<RtcReporter> {
  public:
   static constexpr std::chrono::seconds kBackendTimeout{9};
 
-  // What the worker knows of its session when it starts.
+  // What the worker knows about its session when it starts.
   struct Start {
     ValueMap configuration;
     std::string serviceName;
@@ -39,10 +40,10 @@ class RtcReporter : public std::enable_shared_from_this<RtcReporter> {
   explicit RtcReporter(std::shared_ptr<Strand> queue);
   ~RtcReporter();
 
-  // All on the queue.
+  // All of these are called on the queue.
   void start(const Start& start);
   void handleMessage(TWReportingSessionMessage& message);
-  // The session's messages as copies of their own.
+  // `messages` are copies of the session's messages, made for this call.
   void sendSummary(const TWReportingSessionMessages& messages, AudioServiceType serviceType,
                    ReporterID reporterID);
   void stop();
@@ -61,9 +62,9 @@ class RtcReporter : public std::enable_shared_from_this<RtcReporter> {
   bool linkReportSessionStarted_ = false;
   std::unique_ptr<LinkReportSession> linkReportSession_;
   std::optional<std::string> linkReportAgentToken_;
-  std::uint64_t run_ = 0;  // starts so far: answers to an earlier one come too late
+  std::uint64_t run_ = 0;  // the number of starts; an answer to an earlier start is ignored
   bool hasAnswer_ = false;
-  std::unique_ptr<Timer> timeout_;  // last: its tick refers to this
+  std::unique_ptr<Timer> timeout_;  // last, because its tick refers to this
 };
 
 }  // namespace tonewerk

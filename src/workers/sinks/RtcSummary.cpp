@@ -9,7 +9,7 @@
 namespace tonewerk {
 namespace {
 
-// Joined texts under keys, in the order of the keys' first coming.
+// Joined texts under keys, in the order in which the keys first came.
 class JoinedTexts {
  public:
   void add(const SharedString& key, const Value& value) {

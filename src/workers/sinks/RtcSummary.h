@@ -6,9 +6,10 @@
 
 namespace tonewerk {
 
-// Every key that the messages carried with all its values, as texts joined by commas in the messages' order:
-// {"a": "1,2"}. "TW_Session_Summary_Event" begins with the service type. Left out is what was redundant, came
-// before the session was started, or was meant for other workers than `workerClass`.
+// Makes the summary of a session's messages: every key with all its values, as texts joined by commas in the
+// order of the messages, like {"a": "1,2"}. "TW_Session_Summary_Event" begins with the service type.
+// Redundant messages, those from before the session's start, and those for workers other than `workerClass`
+// are left out.
 ValueMap rtcSummaryOf(const TWReportingSessionMessages& messages, AudioServiceType serviceType,
                       const TWReportingSessionWorkerClass& workerClass);
 

@@ -67,8 +67,8 @@ std::error_code SummaryJsonFile::withFreeName(
 
 void SummaryJsonFile::writeLine(std::string_view text) {
   if (reportFileHandle_ == nullptr) return;
-  // Only the line's end is looked at: a disk that refuses the text refuses that too, and is then reported
-  // once. What is missing keeps the file from appearing, which is said at its end.
+  // Only a failure to write the line's end is logged: a disk that refuses the text refuses the end, too, and
+  // each line is then logged once. A file that is not complete does not appear, and closeFile() logs that.
   static_cast<void>(reportFileHandle_->write(text));
   if (const std::error_code error = reportFileHandle_->write("\n")) {
     errorLog(TWReportingSummaryLogCategory(),
@@ -88,7 +88,7 @@ void SummaryJsonFile::writeMessage(AudioEventCategory category, AudioEventType t
       TWReportingContext::current().platform().json.pretty(ValueMap{{member, payload}}, problem);
   if (!text) {
     errorLog(TWReportingSummaryLogCategory(), "dataWithJSONObject: %@", problem);
-    writeLine("");  // where the entry would be: the array goes on without it
+    writeLine("");  // in place of the entry; the array continues without it
     return;
   }
   if (std::exchange(hasEntry_, true)) writeLine(",");

@@ -15,7 +15,8 @@ namespace tonewerk {
 
 class NewFile;
 
-// One JSON summary file: an array written line by line, an object of one member a message.
+// Writes one JSON summary file: an array, written line by line, with an object of one member for each
+// message.
 //
 //   [
 //   {
@@ -25,26 +26,28 @@ class NewFile;
 //   ...
 //   ]
 //
-// It appears under its name when it is whole, never before; where the name is taken it gets "-2", "-3" ...
-// before ".json". A message that JSON cannot say leaves an empty line and the array around it valid; a file
-// that could not be written to its end does not appear.
+// The file appears under its name when it is complete, never before. When the name is taken, it gets "-2",
+// "-3" ... before ".json". A message that cannot be written as JSON leaves an empty line, and the array stays
+// valid. A file that could not be written to its end does not appear.
 //
-// Failures are logged and never stop the rest. One thread at a time.
+// A failure is logged, and the rest is still written. Used by one thread at a time.
 class SummaryJsonFile {
  public:
-  // The file is made in `directory`, which is made too, at the first message. `name` ends with ".json".
+  // The file is made with the first message, in `directory`, which is made when it is missing. `name` ends
+  // with ".json".
   SummaryJsonFile(std::string directory, std::string name);
   ~SummaryJsonFile();
 
-  // The member is called by category, type and how many of the two this file has had.
+  // Writes a member whose name is the category, the type and how many messages of both the file has had.
   void writeMessage(AudioEventCategory category, AudioEventType type, const ValueMap& payload);
 
-  // Ends the array. Also when nothing was written: then it writes nothing, and logs the closing all the same.
+  // Ends the array and gives the file its name. Without a message it writes nothing, but logs the closing.
   void closeFile();
 
  private:
   void openFile();
-  // Goes on to the next name while the attempt says that it is taken; the last attempt's error.
+  // Calls `attempt` with one name after the other while it fails because the name is taken. Returns its last
+  // error.
   [[nodiscard]] std::error_code withFreeName(
       const std::function<std::error_code(const std::string& name)>& attempt);
   void writeLine(std::string_view text);
@@ -54,7 +57,7 @@ class SummaryJsonFile {
   std::size_t nameNumber_ = 1;
   std::string reportPath_;  // empty until the first message
   std::unique_ptr<NewFile> reportFileHandle_;
-  bool hasEntry_ = false;  // one with a text
+  bool hasEntry_ = false;  // whether an entry with a text was written
   std::unordered_map<std::string, std::size_t> counts_;
 };
 

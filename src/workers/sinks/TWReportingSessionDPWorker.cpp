@@ -41,7 +41,7 @@ std::int32_t bufferSizeOf(const TWReportingSessionMessage& message) {
   return integer32Of(message.message.find(kSmallestBufferFrameSize));
 }
 
-// Whole microseconds; none for what is no time.
+// Whole microseconds; 0 for a number that is no time.
 std::chrono::microseconds waitTimeOf(double microseconds) {
   constexpr std::chrono::microseconds kMax = TWReportingSessionDPWorker::kMaxWaitTime;
   if (!(microseconds > 0.0)) return std::chrono::microseconds(0);
@@ -52,7 +52,7 @@ std::chrono::microseconds waitTimeOf(double microseconds) {
 void requestTrace(const TWReportingSessionMessage& message) {
   const Platform& platform = TWReportingContext::current().platform();
   platform.clock.sleep(settings().waitTime);
-  ValueMap payload = message.message;  // shares nothing that somebody else can change
+  ValueMap payload = message.message;  // later changes of the message do not reach it
   infoLog(TWReportingDPLogCategory(), "Dropping whirlcap %@", message);
   platform.whirlcaps.request("com.orvane.tonewerk", "AudioOverloads",
                              textOf(payload.find(TWReportingApplicationName)), payload,

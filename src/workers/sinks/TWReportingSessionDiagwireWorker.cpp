@@ -14,7 +14,7 @@
 namespace tonewerk {
 namespace {
 
-// Null, and logged, when the message lacks the key.
+// Null when the message lacks the key, which is logged.
 const Value* valueOf(const ValueMap& message, std::string_view key) {
   const Value* value = message.find(key);
   if (value == nullptr)
@@ -22,7 +22,7 @@ const Value* valueOf(const ValueMap& message, std::string_view key) {
   return value;
 }
 
-// The record's fields end at a zero byte, as C strings do.
+// The fields of the record end at a zero byte, like C strings.
 void setBytes(std::string& field, const ValueMap& message, std::string_view key) {
   const Value* value = valueOf(message, key);
   if (value == nullptr) return;

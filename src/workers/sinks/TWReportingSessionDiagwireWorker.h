@@ -7,7 +7,7 @@
 
 namespace tonewerk {
 
-// Posts each issue-detector message to the metric service as it arrives. Keeps nothing.
+// Posts each issue-detector message to the metric service when it arrives. Keeps nothing.
 class TWReportingSessionDiagwireWorker final : public TWReportingSessionWorkerConsumerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
@@ -19,7 +19,7 @@ class TWReportingSessionDiagwireWorker final : public TWReportingSessionWorkerCo
     session = owner;
   }
 
-  // Always false. What the message lacks is logged, and the record is posted without it.
+  // Always false. A key that the message lacks is logged, and the record is posted without it.
   bool handleMessage(const TWReportingSessionMessage& message) override;
 };
 

@@ -72,7 +72,7 @@ void TWReportingSessionEnergybookWorker::handleEngineOnDurationMessage(const Val
 void TWReportingSessionEnergybookWorker::handleEngineStateMessage(const ValueMap& message) const {
   const Value* engineState = message.find(kEngineState);
   if (engineState == nullptr) return;
-  // Unlike for a duration, an unknown application is named so, and what is missing is not worth a line.
+  // Unlike for a duration, an unknown application is sent as such, and missing values are not logged.
   ValueMap payload{{kStatus, *engineState == kEngineOn}, {kApplicationName, applicationName()}};
   if (const Value* timestamp = message.find(TWReportingMessageKeyTWTimestamp)) {
     payload.set(kTimestampEnd, *timestamp);

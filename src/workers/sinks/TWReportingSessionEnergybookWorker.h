@@ -8,8 +8,8 @@
 
 namespace tonewerk {
 
-// Passes on to the power log what the haptics engine reports: how long it was on, whether it is on, and
-// sessions that keep it on for too long. Looks at messages of type Energybook only. Keeps nothing.
+// Passes the haptics engine's reports on to the power log: how long it was on, whether it is on, and sessions
+// that keep it on too long. Handles only messages of type Energybook. Keeps nothing.
 class TWReportingSessionEnergybookWorker final : public TWReportingSessionWorkerConsumerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
@@ -21,7 +21,7 @@ class TWReportingSessionEnergybookWorker final : public TWReportingSessionWorker
     session = owner;
   }
 
-  // Sends an event for each of the three that the message speaks of. Always false.
+  // Sends an event for each of these three that the message reports. Always false.
   bool handleMessage(const TWReportingSessionMessage& message) override;
 
  private:

@@ -7,8 +7,8 @@
 
 namespace tonewerk {
 
-// Passes every message on to the analytics service as it arrives, under two event names: one for the
-// framework, one for the session's service. Keeps nothing.
+// Sends every message to the analytics service when it arrives, under two event names: one for the framework
+// and one for the session's service. Keeps nothing.
 class TWReportingSessionMetriconWorker final : public TWReportingSessionWorkerConsumerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;

@@ -71,7 +71,7 @@ void TWReportingSessionRtcWorker::stop() {
     copies.push_back(message->copyWithZone());
     bytes += sizeof(TWReportingSessionMessage) + message->message.bytes();
   }
-  // Two pieces, so that a summary which finds no room does not take the session's end with it.
+  // These are two pieces, so that when there is no room for the summary, the session is still ended.
   linkReportQueue_->submit(
       bytes, [reporter = reporter_, held = std::move(copies), serviceType = owner->serviceType(),
               reporterID = owner->reporterID()] { reporter->sendSummary(held, serviceType, reporterID); });

@@ -12,12 +12,12 @@ namespace tonewerk {
 class Strand;
 class RtcReporter;
 
-// Forwards a session's messages to the real-time-communication reporting service as they arrive, and when the
-// session stops one summary of every key that they carried. Not for sessions of the "test" service.
+// Forwards a session's messages to the real-time-communication reporting service when they arrive, and when
+// the session stops one summary of all their keys. Sessions of the "test" service have no such worker.
 //
-// The work queue only queues: everything with the service happens on a private serial queue. Its first piece
-// waits up to nine seconds for the service's backends, and messages and the stop wait behind it. The
-// framework's `started` is the session's business and not changed by the backends' answer.
+// The work queue only queues the work. The service is used on a private serial queue. The first piece there
+// waits up to nine seconds for the service's backends, and messages and the stop wait behind it. `started`
+// belongs to the session; the backends' answer does not change it.
 class TWReportingSessionRtcWorker final : public TWReportingSessionWorkerConsumerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
@@ -28,22 +28,22 @@ class TWReportingSessionRtcWorker final : public TWReportingSessionWorkerConsume
   static std::shared_ptr<TWReportingSessionRtcWorker> initWithSession(
       const std::shared_ptr<TWReportingSession>& session);
 
-  // False when the session has become one of the "test" service.
+  // False when the session now has the "test" service.
   std::optional<bool> start() override;
   // Always false.
   bool handleMessage(const TWReportingSessionMessage& message) override;
   void stop() override;
 
-  // Whether the service may gather events before it sends them.
+  // Whether the service may collect events before it sends them.
   static bool shouldBatchLinkReportEventsForServiceType(AudioServiceType serviceType);
-  // The base category; the domain is never sent.
+  // The category without its domain, which is never sent.
   static std::uint16_t retrieveLinkReportCategoryFromCategory(AudioEventCategory category);
 
  private:
   void makeQueueOnFirstUse();
 
   std::shared_ptr<Strand> linkReportQueue_;
-  std::shared_ptr<RtcReporter> reporter_;  // shared with the queue's work
+  std::shared_ptr<RtcReporter> reporter_;  // the queue's work shares it
 };
 
 }  // namespace tonewerk

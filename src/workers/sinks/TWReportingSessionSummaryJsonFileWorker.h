@@ -8,10 +8,11 @@
 
 namespace tonewerk {
 
-// Writes a stopping session's messages, derived ones included, into a JSON file in the reporting logs
-// directory. On internal builds for every session, elsewhere for those of the "test" service.
+// Writes a session's messages, when it stops, into a JSON file in the reporting logs directory, with the
+// messages that producers made. On internal builds every session gets a file, elsewhere those of the "test"
+// service.
 //
-// The messages are taken on the work queue, the file is written on the file sinks' own.
+// The messages are taken on the work queue. The file is written on the file sinks' own queue.
 class TWReportingSessionSummaryJsonFileWorker final : public TWReportingSessionWorkerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
@@ -25,7 +26,8 @@ class TWReportingSessionSummaryJsonFileWorker final : public TWReportingSessionW
 
   // "<logs>/Audio/Reporting".
   static std::string TWReportingLogsDirectory();
-  // "20261120-101800+0100-77-com.orvane.player-longformaudio.json": the local time, then what the session is.
+  // "20261120-101800+0100-77-com.orvane.player-longformaudio.json": the local time, then the session's
+  // identifier, application and service.
   static std::string fileNameFor(const TWReportingSession& session);
 };
 

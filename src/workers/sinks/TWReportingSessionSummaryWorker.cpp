@@ -24,7 +24,7 @@ std::string_view thermalStateText(int level) {
   return level >= 0 && level < 4 ? kTexts[static_cast<std::size_t>(level)] : "Unknown";
 }
 
-// The low 32 bits of the footprint count, as they always have: 4 GiB and more wrap.
+// Only the low 32 bits of the footprint count, as ever: 4 GiB and more wrap.
 std::uint32_t mebibytes(std::uint64_t bytes) { return static_cast<std::uint32_t>(bytes) >> 20; }
 
 void addDeviceState(ValueMap& summary) {
@@ -76,7 +76,8 @@ ValueMap TWReportingSessionSummaryWorker::summaryOf(const TWReportingSession& ow
       {"average_active_time", activeCount_ == 0 ? 0.0 : totalActiveTime_ / activeCount_},
       {"num_messages", received},
       {"num_unique_messages", stored},
-      {"num_redundant_messages", received - stored},  // an approximation: wraps when more is stored than came
+      {"num_redundant_messages",
+       received - stored},  // an approximation: wraps when more are stored than were received
       {"singleMessageSession", owner.isSingleMessageSession()},
       {"summaryServiceName", owner.serviceName()},
       {TWReportingApplicationName, TWReportingUtilityRetrieveAppName(owner.configuration())},

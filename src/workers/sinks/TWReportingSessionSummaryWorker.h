@@ -10,10 +10,10 @@
 
 namespace tonewerk {
 
-// Counts how long a session's audio was active and how often it overloaded, and says so, with the session's
-// message counts and the device's state, in one summary message when the session stops.
+// Counts how long a session's audio was active and how often it overloaded. When the session stops, it sends
+// one summary message with these, the session's message counts and the device's state.
 //
-// The counts go on across stops: a session that is started again reports the totals of all its runs.
+// The counts continue after a stop: a session that is started again reports the totals of all its runs.
 class TWReportingSessionSummaryWorker final : public TWReportingSessionWorkerProducerProtocol,
                                               public TWReportingSessionWorkerConsumerProtocol {
  public:

@@ -10,16 +10,16 @@
 
 namespace tonewerk {
 
-// Who asks for which analytics events: what the preference "consumers" of the domain "com.orvane.metricon"
-// says, an array of maps {"name": text, "events": [pattern, ...]}. A pattern is a shell's: *, ? and [...]
-// stand for characters.
+// Knows which analytics events consumers ask for. The preference "consumers" of the domain
+// "com.orvane.metricon" says so: an array of maps {"name": text, "events": [pattern, ...]}. A pattern is
+// written as in a shell: *, ? and [...] stand for characters.
 class AnalyticsConsumers {
  public:
-  // Without the preference, one consumer "local" asks for "com.orvane.*". What cannot be read is left out and
-  // said in `problems`, one text each.
+  // Without the preference, one consumer "local" asks for "com.orvane.*". Entries and patterns that cannot be
+  // read are left out, and `problems` gets one text for each.
   AnalyticsConsumers(const std::optional<Value>& preference, std::vector<std::string>& problems);
 
-  // Whether anybody asks for events of this name.
+  // Whether a consumer asks for events of this name.
   bool wants(const std::string& eventName) const;
 
  private:

@@ -13,18 +13,20 @@ namespace tonewerk {
 
 class JsonService;
 
-// The analytics rows and their names in an open report store. The writer's thread, within its transactions.
-// Not to be used again after a transaction was undone: it remembers names as stored that then are not.
+// Writes the analytics rows and their names into an open report store. Used on the writer's thread, within
+// its transactions. After a transaction was undone, a new object is needed: this one may remember names as
+// stored that are not.
 class AnalyticsTable {
  public:
-  // Both outlive it. Prepares its statements; whether that went well shows in the first insert().
+  // `database` and `json` outlive it. Prepares its statement. Whether that succeeded shows in the first
+  // insert().
   AnalyticsTable(SqliteDatabase& database, const JsonService& json);
 
-  // False on failure; the database says which.
+  // False on failure. The database then has the problem.
   [[nodiscard]] bool insert(const AnalyticsRow& row);
 
  private:
-  // Combinations of names are remembered up to this number, then anew.
+  // The identifiers of so many name sets are remembered. When there are more, all are forgotten.
   static constexpr std::size_t kMaxKnown = 4096;
 
   struct NamesHash {

@@ -6,13 +6,13 @@
 
 namespace tonewerk {
 
-// The metric records in an open report store. The writer's thread, within its transactions.
+// Writes the metric records into an open report store. Used on the writer's thread, within its transactions.
 class MetricTable {
  public:
-  // `database` outlives it. Prepares its statement; whether that went well shows in the first insert().
+  // `database` outlives it. Prepares its statement. Whether that succeeded shows in the first insert().
   explicit MetricTable(SqliteDatabase& database);
 
-  // False on failure; the database says which.
+  // False on failure. The database then has the problem.
   [[nodiscard]] bool insert(const MetricRow& row);
 
  private:

@@ -8,13 +8,14 @@ namespace tonewerk {
 
 class JsonService;
 
-// The power events in an open report store. The writer's thread, within its transactions.
+// Writes the power events into an open report store. Used on the writer's thread, within its transactions.
 class PowerTable {
  public:
-  // Both outlive it. Prepares its statement; whether that went well shows in the first insert().
+  // `database` and `json` outlive it. Prepares its statement. Whether that succeeded shows in the first
+  // insert().
   PowerTable(SqliteDatabase& database, const JsonService& json);
 
-  // False on failure; the database says which.
+  // False on failure. The database then has the problem.
   [[nodiscard]] bool insert(const PowerRow& row);
 
  private:

@@ -16,7 +16,8 @@ namespace {
 
 constexpr double kMegabyte = 1 << 20;
 constexpr double kDaySeconds = 86'400.0;
-// A bound beyond this is no bound (a petabyte, some thousand years), and fits every type it is turned into.
+// Larger bounds are cut to this (a petabyte, or 2.7 million years), which every type can hold that they are
+// turned into.
 constexpr double kUnbounded = 1e9;
 
 bool isNumber(const Value& value) {
@@ -57,13 +58,13 @@ void ReportStore::readBoundsAgain() {
 }
 
 bool ReportStore::flush(std::chrono::milliseconds timeout) {
-  assert(std::this_thread::get_id() != thread_.get_id());  // which would wait for itself
+  assert(std::this_thread::get_id() != thread_.get_id());  // it would wait for itself
   return queue_.flush(timeout);
 }
 
 void ReportStore::run() {
   pthread_setname_np(pthread_self(), "tw-store");
-  // The file is there, and its problems are known, before the first row is.
+  // The file is made, and its problems are logged, before the first row is recorded.
   queue_.attempt();
   if (write()) {
     queue_.committed();
@@ -75,7 +76,7 @@ void ReportStore::run() {
   }
 }
 
-// False when the store ends without the rows being written.
+// Writes the batch, again after each failure. False when the store stops and the rows are not written.
 bool ReportStore::writeUntilDone() {
   GrowingDelay backOff(kFirstBackOff, kLongestBackOff);
   for (;;) {
@@ -87,7 +88,7 @@ bool ReportStore::writeUntilDone() {
       break;
     }
   }
-  // Said before who waits for the rows goes on.
+  // The log line comes before those who wait for the rows continue.
   logSuccess(queue_.takeDropped());
   queue_.committed();
   return true;
@@ -151,7 +152,7 @@ void ReportStore::readBounds() {
   database_.setBounds(bounds_);
 }
 
-// The preference when it is a number from 1, else `otherwise`; one that is something else is named in
+// The preference if it is a number from 1, else `otherwise`. A value that is no such number is added to
 // `wrong`.
 double ReportStore::bound(std::string_view key, double otherwise, std::string& wrong) const {
   const std::optional<Value> value = preferences_.read(kPreferenceDomain, key);

@@ -19,18 +19,18 @@ class JsonService;
 class LogCategory;
 class PreferenceStore;
 
-// The reports kept on the device: one SQLite file, written by one thread in batches at most 100 ms behind,
-// readable by anybody at any time. docs/store.md says what is in it.
+// Keeps the reports on the device: in one SQLite file, written by one thread in batches, at most 100 ms late.
+// Any program can read it at any time. docs/store.md describes what is in it.
 //
-// Recording costs the caller a place in a bounded queue; JSON and SQL are the thread's. While the queue is
-// full because more comes in than the disk takes, recording waits. While the file cannot be written (a full
-// disk, a missing directory, a file of a newer version) or the disk hangs, recording does not wait: rows are
-// kept while there is room and then dropped, and their number is logged when writing goes on, and at the end.
-// A damaged file is moved aside.
+// Recording costs the caller a place in a bounded queue. The thread makes the JSON and runs the SQL. When the
+// queue is full because more is recorded than the disk takes, recording waits. When the file cannot be
+// written (a full disk, a missing directory, a file of a newer version) or the disk hangs, recording does not
+// wait: rows are kept while there is room and then dropped. Their number is logged when writing succeeds
+// again, and at the end. A damaged file is moved aside.
 //
-// The bounds are preferences of the domain "com.orvane.tonewerk.store": "max_megabytes" (256) and "max_days"
-// (30). They are read again every ten seconds while there is something to write, and when somebody asks for
-// it; what is too old is deleted then.
+// The bounds are the preferences "max_megabytes" (256) and "max_days" (30) of the domain
+// "com.orvane.tonewerk.store". They are read again every ten seconds while there is something to write, and
+// when readBoundsAgain() asks for it. Rows that are too old are deleted then.
 class ReportStore {
  public:
   static constexpr std::string_view kPreferenceDomain = "com.orvane.tonewerk.store";
@@ -39,13 +39,12 @@ class ReportStore {
 
   using Limits = StoreQueue::Limits;
 
-  // The file lies in `directory`, which is made when it is missing. Everything referred to outlives the
-  // store.
+  // The file is in `directory`, which is made when it is missing. All references outlive the store.
   ReportStore(const std::string& directory, const JsonService& json, const PreferenceStore& preferences,
               const Clock& clock, const LogCategory& log, const Limits& limits = {});
   ReportStore(const ReportStore&) = delete;
   ReportStore& operator=(const ReportStore&) = delete;
-  // Writes what is still to be written, if that goes well at the first try.
+  // Writes the rows that are left, and gives up when that fails. Logs how many rows are lost.
   ~ReportStore();
 
   // Any thread. `recordedAt` in seconds since 1970.
@@ -53,15 +52,16 @@ class ReportStore {
   // Any thread. A row of any table.
   void record(StoreRow row);
 
-  // Any thread. The bounds are read again and kept to at once, also where there is nothing to write.
+  // Any thread. The bounds are read again and applied at once, also when there is nothing to write.
   void readBoundsAgain();
 
-  // Any thread but the work of JsonService, preferences and log. Returns when everything recorded before is
-  // in the file; false when it cannot be written or `timeout` passed.
+  // Any thread, but not from within JsonService, preferences or log, which the store's own thread calls.
+  // Returns when everything recorded before is in the file. False when that fails or takes longer than
+  // `timeout`.
   [[nodiscard]] bool flush(std::chrono::milliseconds timeout);
 
  private:
-  // Keeps the preferences from being read for each batch.
+  // Limits how often the preferences are read: not for each batch.
   static constexpr std::chrono::seconds kBoundsInterval{10};
   static constexpr std::chrono::milliseconds kFirstBackOff{500};
   static constexpr std::chrono::milliseconds kLongestBackOff{30'000};
@@ -83,12 +83,12 @@ class ReportStore {
   StoreQueue queue_;
   std::atomic<bool> areBoundsStale_ = true;
 
-  // The thread's own.
+  // Used by the thread alone.
   StoreDatabase database_;
   std::vector<StoreRow> batch_;
   StoreBounds bounds_;
   std::chrono::nanoseconds boundsReadAt_{0};
-  bool ageDue_ = false;  // a look at the oldest rows is due
+  bool ageDue_ = false;  // the oldest rows are to be checked
   bool moreToTrim_ = false;
   std::string loggedProblem_;  // empty while writing goes well
   std::string loggedTrimProblem_;

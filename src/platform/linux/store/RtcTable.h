@@ -12,25 +12,25 @@ namespace tonewerk {
 
 class JsonService;
 
-// The real-time-communication sessions and messages in an open report store. The writer's thread, within its
-// transactions. Not to be used again after a transaction was undone.
+// Writes the real-time-communication sessions and messages into an open report store. Used on the writer's
+// thread, within its transactions. After a transaction was undone, a new object is needed.
 //
-// A message whose session is not in the file, because the session's own row was dropped or a new file begun,
-// brings the session's row with it.
+// When the file lacks a message's session, the session's row is written before the message's. That happens
+// when the session's own row was dropped, or when a new file was begun after it.
 class RtcTable {
  public:
-  // Both outlive it. `fileNumber` tells this file from those that the process wrote before. Prepares its
-  // statements; whether that went well shows in the first insert().
+  // `database` and `json` outlive it. `fileNumber` distinguishes this file from those that the process wrote
+  // before. Prepares its statements. Whether that succeeded shows in the first insert().
   RtcTable(SqliteDatabase& database, const JsonService& json, std::uint64_t fileNumber);
   RtcTable(const RtcTable&) = delete;
   RtcTable& operator=(const RtcTable&) = delete;
-  // Sessions that were not committed have no place again.
+  // Takes back the place of sessions that were not committed.
   ~RtcTable();
 
-  // False on failure; the database says which.
+  // False on failure. The database then has the problem.
   [[nodiscard]] bool insert(const RtcSessionRow& row);
   [[nodiscard]] bool insert(const RtcMessageRow& row);
-  // What was inserted is in the file.
+  // The inserted rows are in the file.
   void committed();
 
  private:

@@ -7,7 +7,7 @@
 namespace tonewerk {
 namespace {
 
-// A file name as the path of a URI.
+// Escapes a file name for the path of a URI.
 std::string uriPath(const std::string& path) {
   std::string escaped;
   for (const char c : path) {

@@ -12,8 +12,8 @@ struct sqlite3;
 
 namespace tonewerk {
 
-// A connection to a SQLite database file. One thread. After a failure problem() and isCorrupt() speak of it
-// until the next call.
+// A connection to a SQLite database file. Used by one thread at a time. After a failure, problem() and
+// isCorrupt() describe it until the next call.
 class SqliteDatabase {
  public:
   enum class Mode {
@@ -27,26 +27,26 @@ class SqliteDatabase {
   SqliteDatabase& operator=(const SqliteDatabase&) = delete;
   ~SqliteDatabase();
 
-  // On failure it is closed; the failure can still be asked for. `patience` is how long a statement waits for
-  // another process's lock.
+  // After a failure it counts as closed, and problem() still describes the failure. `patience` is how long a
+  // statement waits for another process's lock.
   [[nodiscard]] bool open(const std::string& path, Mode mode, std::chrono::milliseconds patience);
-  // Statements of this database must be gone.
+  // Its statements must be destroyed before.
   void close();
   bool isOpen() const { return isOpen_; }
 
-  // One or more statements whose rows nobody wants.
+  // Runs one or more statements and discards their rows.
   [[nodiscard]] bool run(const std::string& sql);
   [[nodiscard]] SqliteStatement prepare(const std::string& sql);
-  // The first column of the first row; none on failure and without a row.
+  // The first column of the first row. None on failure, and when there is no row.
   [[nodiscard]] std::optional<std::int64_t> number(const std::string& sql);
 
-  // Rows touched by the last statement.
+  // The number of rows that the last statement changed.
   std::int64_t changes() const;
-  // Whether the file is no longer where it was opened.
+  // Whether the file is no longer at the path where it was opened.
   bool hasMoved() const;
 
   std::string problem() const;
-  // Whether the last failure says that the file is damaged, or no database at all.
+  // Whether the last failure means that the file is damaged or no database.
   bool isCorrupt() const;
 
  private:

@@ -18,7 +18,8 @@ SqliteStatement& SqliteStatement::operator=(SqliteStatement&& other) noexcept {
 
 SqliteStatement::~SqliteStatement() { sqlite3_finalize(statement_); }
 
-// A failure to bind (only a text too long to store, or no memory) shows as a null, which the schema refuses.
+// A bind fails only for a text that is too long to store, or without memory. The parameter is then null,
+// which the schema refuses.
 void SqliteStatement::bind(int parameter, std::int64_t number) {
   sqlite3_bind_int64(statement_, parameter, number);
 }

@@ -9,10 +9,10 @@ struct sqlite3_stmt;
 
 namespace tonewerk {
 
-// A prepared statement of a SqliteDatabase, which outlives it. One thread.
+// A prepared statement of a SqliteDatabase, which outlives it. Used by one thread at a time.
 //
-// Prepared once and used often: bind what its parameters (?1, ?2, ...) stand for, step through the rows,
-// reset. One that could not be prepared is empty; its steps fail.
+// It is prepared once and used often: bind values to its parameters (?1, ?2, ...), step through the rows,
+// reset. A statement that could not be prepared is empty, and its steps fail.
 class SqliteStatement {
  public:
   enum class Step { kRow, kDone, kFailed };
@@ -25,24 +25,24 @@ class SqliteStatement {
 
   explicit operator bool() const { return statement_ != nullptr; }
 
-  // Parameters count from 1. A text is not copied: it stays valid until reset().
+  // Parameters count from 1. A text is not copied: it must stay valid until reset().
   void bind(int parameter, std::int64_t number);
   void bind(int parameter, double number);
   void bind(int parameter, std::string_view text);
-  // Likewise not copied.
+  // Not copied either.
   void bindBytes(int parameter, std::string_view bytes);
   void bindNull(int parameter);
 
   [[nodiscard]] Step step();
-  // Makes it ready for the next use; what was bound stays bound.
+  // Prepares for the next use. The parameters keep their values.
   void reset();
-  // For a statement without rows: step and reset. False on failure.
+  // Steps and resets a statement that has no rows. False on failure.
   [[nodiscard]] bool run();
 
-  // Columns of the current row, from 0.
+  // Columns of the current row, counted from 0.
   std::int64_t integer(int column) const;
   double number(int column) const;
-  // UTF-8, whoever wrote to the file.
+  // Valid UTF-8, whatever program wrote to the file.
   std::string text(int column) const;
   std::string bytes(int column) const;
   bool isNull(int column) const;

@@ -12,7 +12,7 @@
 namespace tonewerk {
 namespace {
 
-// For a lock that somebody else's writing holds; readers take none.
+// How long a statement waits for another writer's lock. Readers take none.
 constexpr std::chrono::milliseconds kPatience{500};
 
 }  // namespace
@@ -61,7 +61,8 @@ StoreDatabase::Result StoreDatabase::trimSize(bool& moreToDo) {
 
 bool StoreDatabase::moveAside() {
   close();
-  // The log must not meet the next database, whose pages it would overwrite.
+  // The write-ahead log is renamed first: a new database must not find it, or its pages would overwrite the
+  // new ones.
   for (const char* suffix : {"-wal", "-shm", ""}) {
     const std::filesystem::path aside = path_ + ".corrupt" + suffix;
     std::error_code error;
@@ -87,7 +88,7 @@ StoreDatabase::Result StoreDatabase::open() {
     return failWith("it was made by a newer version (schema " + std::to_string(*version) + ")");
   }
   if (*version == 0 && !prepareFile()) return fail();
-  // A commit then costs no sync; one comes with each checkpoint. What a power cut takes is the newest rows.
+  // With this a commit costs no sync; each checkpoint makes one. A power cut loses the newest rows.
   if (!database_.run("PRAGMA journal_mode = WAL; PRAGMA synchronous = NORMAL")) return fail();
   applyBounds();
   analytics_.emplace(database_, json_);
@@ -100,9 +101,9 @@ StoreDatabase::Result StoreDatabase::open() {
 
 bool StoreDatabase::prepareFile() {
   ++fileNumber_;
-  // Before anything else is in the file: later these would take effect only with a rewrite of the whole.
-  // Pages of 8 KiB are cheaper to fill than smaller ones, and a commit of a single message still writes only
-  // one.
+  // These settings come before anything else is in the file; later they would take effect only when the whole
+  // file is rewritten. Pages of 8 KiB are cheaper to fill than smaller ones, and a commit of a single message
+  // still writes one page only.
   return database_.run(
              "PRAGMA page_size = 8192; PRAGMA auto_vacuum = INCREMENTAL; PRAGMA journal_mode = WAL;") &&
          database_.run(storeSchema());
@@ -111,8 +112,8 @@ bool StoreDatabase::prepareFile() {
 void StoreDatabase::applyBounds() {
   const std::int64_t pageBytes = database_.number("PRAGMA page_size").value_or(4096);
   const std::int64_t bytes = bounds_.walBytes();
-  // A checkpoint at half of it leaves room for the batches that come in meanwhile. A failure only leaves the log longer
-  // than it should be; a file that cannot be used shows it in the next write.
+  // A checkpoint at half of the bound leaves room for the batches that are written meanwhile. A failure only
+  // leaves the log longer than it should be; when the file cannot be used, the next write fails, too.
   (void)database_.run("PRAGMA wal_autocheckpoint = " + std::to_string(bytes / 2 / pageBytes) +
                       "; PRAGMA journal_size_limit = " + std::to_string(bytes));
 }
@@ -140,7 +141,7 @@ void StoreDatabase::closeWith(std::string problem) {
 }
 
 void StoreDatabase::close() {
-  // Statements before their database. An open transaction is undone.
+  // Statements are destroyed before their database. An open transaction is undone.
   analytics_.reset();
   metrics_.reset();
   power_.reset();

@@ -16,36 +16,36 @@
 
 namespace tonewerk {
 
-// The report store's file. The writer's thread.
+// The report store's file. Used on the writer's thread.
 //
-// Opened by the first write and again after every failure, so that a disk that comes back, a directory that
-// appears or a file put in place by hand is taken up by the next try.
+// It is opened by the first write, and again after every failure. So the next try uses a disk that works
+// again, a directory that was made, or a file that was put in place by hand.
 class StoreDatabase {
  public:
   enum class Result {
     kDone,
-    kFailed,   // nothing of it is written; another try may go well
-    kCorrupt,  // the file is damaged or no database
+    kFailed,   // nothing is written; another try may succeed
+    kCorrupt,  // the file is damaged or is no database
   };
 
-  // The file lies in `directory`, which is made when it is missing.
+  // The file is in `directory`, which is made when it is missing.
   StoreDatabase(std::string directory, const JsonService& json);
 
-  // All rows, or none of them. The rows are with the operating system afterwards; a power cut may take the
-  // last ones.
+  // Writes all rows or none of them. The operating system then has the rows; a power cut may lose the last
+  // ones.
   [[nodiscard]] Result write(std::span<const StoreRow> rows);
-  // What the next trims and the write-ahead log keep to.
+  // The bounds of the next trims and of the write-ahead log.
   void setBounds(const StoreBounds& bounds);
-  // A slice of deleting what is too old at `now`, or of keeping the file's size; `moreToDo` asks for another.
-  // Nothing to do while it is closed.
+  // Deletes rows that are too old at `now`, or enough rows to keep the file's size, in one slice of work.
+  // Sets `moreToDo` when another slice is needed. Does nothing while the file is closed.
   [[nodiscard]] Result trimAge(double now, bool& moreToDo);
   [[nodiscard]] Result trimSize(bool& moreToDo);
-  // Renames the file and what belongs to it to "<path>.corrupt...", over those of an earlier time. False,
-  // with a problem(), when it cannot.
+  // Renames the file and its side files to "<path>.corrupt...", and replaces those of an earlier time. On
+  // failure it is false, and problem() describes it.
   [[nodiscard]] bool moveAside();
 
   const std::string& path() const { return path_; }
-  // What the last failure was.
+  // Describes the last failure.
   const std::string& problem() const { return problem_; }
 
  private:
@@ -67,12 +67,14 @@ class StoreDatabase {
   const std::string path_;
   const JsonService& json_;
   SqliteDatabase database_;
-  std::optional<AnalyticsTable> analytics_;  // while it is open
-  std::optional<MetricTable> metrics_;       // likewise
-  std::optional<PowerTable> power_;          // likewise
-  std::optional<RtcTable> rtc_;              // likewise
-  std::optional<StoreTrimmer> trimmer_;      // likewise
-  std::uint64_t fileNumber_ = 1;             // of the files that this process began or found, the open one's
+  // Have a value while the file is open.
+  std::optional<AnalyticsTable> analytics_;
+  std::optional<MetricTable> metrics_;
+  std::optional<PowerTable> power_;
+  std::optional<RtcTable> rtc_;
+  std::optional<StoreTrimmer> trimmer_;
+  // Numbers the files that this process began or found; this is the open one's number.
+  std::uint64_t fileNumber_ = 1;
   StoreBounds bounds_;
   std::string problem_;
 };

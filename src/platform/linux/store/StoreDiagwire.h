@@ -8,10 +8,10 @@ namespace tonewerk {
 class Clock;
 class ReportStore;
 
-// The metric service over the report store: records go into its metric table.
+// The metric service over the report store. Records become rows of its metric table.
 class StoreDiagwire final : public Diagwire {
  public:
-  // Both outlive it.
+  // `store` and `clock` outlive it.
   StoreDiagwire(ReportStore& store, const Clock& clock) : store_(store), clock_(clock) {}
 
   void post(std::uint32_t metricIdentifier, const PB::Base& record) override;

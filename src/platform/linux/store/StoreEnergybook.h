@@ -8,10 +8,10 @@ namespace tonewerk {
 class Clock;
 class ReportStore;
 
-// The power log in the report store.
+// The power log over the report store. Events become rows of its table of power events.
 class StoreEnergybook final : public Energybook {
  public:
-  // Both outlive it.
+  // `store` and `clock` outlive it.
   StoreEnergybook(ReportStore& store, const Clock& clock) : store_(store), clock_(clock) {}
 
   void sendEvent(std::int32_t group, const SharedString& name, ValueMap payload) override;

@@ -18,29 +18,30 @@ class LogCategory;
 class PreferenceStore;
 class ReportStore;
 
-// The analytics event service over the report store. An event is one row, however many consumers ask for it and
-// whichever of its names they ask for.
+// The analytics event service over the report store. An event is one row, whatever the number of its names
+// and of the consumers that ask for it.
 //
-// Who asks for what is read from the preferences, again at most once a second of the monotonic clock: a
-// change shows within a second. Entries that cannot be read are logged once, until they change, and left out.
+// The consumers are read from the preferences, again at most once a second of the monotonic clock, so a
+// change takes effect within a second. Entries that cannot be read are left out, and logged once until the
+// preference changes.
 class StoreMetricon final : public Metricon {
  public:
   static constexpr std::string_view kPreferenceDomain = "com.orvane.metricon";
   static constexpr std::string_view kConsumersKey = "consumers";
 
-  // Everything outlives it.
+  // All references outlive it.
   StoreMetricon(ReportStore& store, const PreferenceStore& preferences, const Clock& clock,
                 const LogCategory& log);
   ~StoreMetricon() override;
 
-  // Any thread. The next event finds the preference as it is then.
+  // Any thread. The next event reads the preference again.
   void readConsumersAgain();
 
   void sendEvent(const EventNames& names, const UniqueFunction<ValueMap()>& payload) override;
 
  private:
   static constexpr std::chrono::seconds kReadInterval{1};
-  // Names whose answer is remembered; the next one begins anew.
+  // The answers for so many names are remembered. When there are more, all are forgotten.
   static constexpr std::size_t kMaxRemembered = 4096;
 
   struct NameHash {
@@ -48,7 +49,7 @@ class StoreMetricon final : public Metricon {
     std::size_t operator()(std::string_view name) const { return SharedString::hashOf(name); }
   };
 
-  // Those of the names that somebody asks for; both empty when nobody does.
+  // The names that a consumer asks for. `first` is empty when there are none.
   EventNames usedOf(const EventNames& names);
   bool isUsed(const SharedString& name) REQUIRES(mutex_);
   void readConsumers() REQUIRES(mutex_);
@@ -60,7 +61,7 @@ class StoreMetricon final : public Metricon {
 
   Mutex mutex_;
   std::optional<AnalyticsConsumers> consumers_ GUARDED_BY(mutex_);
-  std::optional<Value> preference_ GUARDED_BY(mutex_);  // what consumers_ was made of
+  std::optional<Value> preference_ GUARDED_BY(mutex_);  // consumers_ was made of this
   std::chrono::nanoseconds readAt_ GUARDED_BY(mutex_){0};
   bool isStale_ GUARDED_BY(mutex_) = true;
   std::unordered_map<std::string, bool, NameHash, std::equal_to<>> remembered_ GUARDED_BY(mutex_);

@@ -120,7 +120,7 @@ std::uint64_t StoreQueue::lost() const {
 
 bool StoreQueue::fits(std::size_t bytes) const {
   const std::size_t rows = queued_.size() + takenRows_;
-  // A row larger than all the room there is passes alone.
+  // A row that is larger than all the room passes when the queue is empty.
   return rows == 0 || (rows < limits_.rows && queuedBytes_ + takenBytes_ + bytes <= limits_.bytes);
 }
 

@@ -12,63 +12,64 @@
 
 namespace tonewerk {
 
-// The bounded queue between those who record and the one thread that writes.
+// The bounded queue between the threads that record and the one thread that writes.
 //
 //   add ... add ->  queued  -> take() -> being written -> committed()
 //                                             |  ^
 //                                     failed()v  |  after pause()
 //                                          kept by the writer
 //
-// Rows count against the bounds until they are committed. While writing goes well, add() waits for room.
-// After failed(), or when the writer does nothing for the hold time, add() never waits: what does not fit is
-// dropped and counted, until the next committed().
+// Rows count against the bounds until they are committed. While writing succeeds, add() waits for room. After
+// failed(), or when the writer makes no progress for the hold time, add() does not wait until the next
+// committed(): rows that do not fit are dropped and counted.
 class StoreQueue {
  public:
   struct Limits {
     std::size_t rows = 8192;
     std::size_t bytes = 16 << 20;
-    // Rows wait this long for company, or until there are so many or a quarter of the bytes.
+    // The writer waits this long for more rows, or until there are so many or a quarter of the bytes.
     std::chrono::milliseconds gather{80};
     std::size_t batchRows = 1000;
-    // What is taken at once is at most so many rows and about so many bytes, so that the file never outgrows
-    // its bounds by more.
+    // One batch has at most so many rows and about so many bytes, so that the file exceeds its bounds by no
+    // more.
     std::size_t batchBytes = 512 << 10;
-    // The longest that add() waits.
+    // The longest time that add() waits.
     std::chrono::milliseconds hold{2000};
   };
 
   explicit StoreQueue(const Limits& limits) : limits_(limits) {}
 
-  // Any thread. Returns true when this row begins a time of dropping because of the hold time.
+  // Any thread. True when this row waited for the whole hold time, so that from now on rows are dropped.
   [[nodiscard]] bool add(StoreRow row);
 
-  // Any thread. Waits until everything added before is committed; false when the first try to write that
-  // began after the call fails, or after `timeout`.
+  // Any thread. Waits until everything added before is committed. False when the first try to write that
+  // begins after the call fails, or after `timeout`.
   [[nodiscard]] bool flush(std::chrono::milliseconds timeout);
 
-  // Any thread. The next take() does not wait for rows, or one that waits comes back, perhaps with none.
+  // Any thread. The next take(), or one that waits now, returns without waiting for rows, perhaps with none.
   void nudge();
 
-  // Ends take() and pause(), once the queue is empty or writing fails.
+  // Any thread. Ends take() when the queue is empty, and pause().
   void stop();
 
-  // The writer's thread. Replaces `batch`, whose rows are committed, by the next rows. Without `wait` it
-  // comes back at once, perhaps with none. False when stopped and empty.
+  // The functions from here to pause() are for the writer's thread. take() replaces `batch`, whose rows are
+  // committed, by the next rows. Without `wait` it returns at once, perhaps with none. False when stopped and
+  // empty.
   [[nodiscard]] bool take(std::vector<StoreRow>& batch, bool wait);
-  // A try to write what was taken begins.
+  // A try to write the batch begins.
   void attempt();
-  // The rows taken are in the file.
+  // The batch is in the file.
   void committed();
-  // The rows taken are not in the file; the writer keeps them.
+  // The batch is not in the file. The writer keeps it.
   void failed();
-  // Returns after `time` or when flush() or stop() ask for another try. False when stopped: that try is the
-  // last.
+  // Returns after `time`, or earlier when flush() or stop() ask for another try. False when stopped: that try
+  // is the last.
   [[nodiscard]] bool pause(std::chrono::nanoseconds time);
 
-  // The number of rows dropped since the last time.
+  // Any thread. The number of rows dropped since the last call.
   [[nodiscard]] std::uint64_t takeDropped();
-  // Rows that are not committed, and those dropped since the last takeDropped(): what is lost when nobody
-  // writes any more.
+  // Any thread. The rows that are not committed, and those dropped since the last takeDropped(). They are
+  // lost when the writer has ended.
   std::uint64_t lost() const;
 
  private:
@@ -77,9 +78,9 @@ class StoreQueue {
 
   const Limits limits_;
   mutable Mutex mutex_;
-  Condition work_;      // for the writer
-  Condition room_;      // for add()
-  Condition progress_;  // for flush()
+  Condition work_;      // the writer waits for work
+  Condition room_;      // add() waits for room
+  Condition progress_;  // flush() waits for commits
 
   std::deque<StoreRow> queued_ GUARDED_BY(mutex_);
   bool leftOver_ GUARDED_BY(mutex_) = false;  // rows that did not fit into the last batch
@@ -92,7 +93,7 @@ class StoreQueue {
   std::uint64_t added_ GUARDED_BY(mutex_) = 0;
   std::uint64_t committed_ GUARDED_BY(mutex_) = 0;
   std::uint64_t dropped_ GUARDED_BY(mutex_) = 0;
-  // Flushes are numbered. A try that fails disappoints those asked for before it began.
+  // Flushes are numbered. When a try to write fails, the flushes fail that were asked for before it began.
   std::uint64_t lastFlush_ GUARDED_BY(mutex_) = 0;
   std::uint64_t attemptedFlush_ GUARDED_BY(mutex_) = 0;
   std::uint64_t failedFlush_ GUARDED_BY(mutex_) = 0;

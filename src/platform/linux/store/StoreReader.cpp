@@ -12,7 +12,8 @@ namespace {
 
 constexpr std::chrono::seconds kPatience{5};
 
-// What the queries below say of a filter, as parameters 2 to 6. Parameter 1 is the names of a row.
+// The filter's conditions in the queries below. Parameters 2 to 6 are the filter's; parameter 1 is
+// kStoreNamesPerRow.
 std::string conditions(const EventFilter& filter, const std::string& name, const std::string& recordedAt) {
   std::string sql;
   if (filter.name) sql += " AND " + name + " GLOB ?3";
@@ -21,7 +22,7 @@ std::string conditions(const EventFilter& filter, const std::string& name, const
   return sql;
 }
 
-// On the tables below the view: there, what comes after an identifier is found by key.
+// Reads the tables instead of the view, because there the rows after an identifier are found by key.
 std::string eventQuery(const EventFilter& filter) {
   std::string sql =
       "SELECT r.id * ?1 + n.position AS id, r.recorded_at AS recorded_at, n.name AS name, r.payload AS "
@@ -33,7 +34,7 @@ std::string eventQuery(const EventFilter& filter) {
   return "SELECT * FROM (" + sql + " ORDER BY r.id DESC, n.position DESC LIMIT ?6) ORDER BY id";
 }
 
-// The rows of `sql`, which has an id, oldest first, or the newest so many.
+// The rows of `sql`, which has an id, oldest first. With a limit, only the newest so many.
 std::string limitedById(const std::string& sql, const EventFilter& filter) {
   if (!filter.limit) return sql + " ORDER BY id";
   return "SELECT * FROM (" + sql + " ORDER BY id DESC LIMIT ?6) ORDER BY id";
@@ -62,7 +63,7 @@ std::string rtcSessionQuery(const EventFilter& filter) {
   return limitedById(sql + conditions(filter, kRtcServiceName, "s.started_at"), filter);
 }
 
-// A message can outlive its session's row; it then has no name.
+// A message may still be stored when its session's row has been deleted. It then has no name.
 std::string rtcMessageQuery(const EventFilter& filter) {
   const std::string sql =
       "SELECT m.id AS id, m.sent_at, m.rtc_session, m.category, m.type, m.payload"
@@ -88,8 +89,9 @@ StoreReader::Outcome StoreReader::open(const std::string& directory) {
     return Outcome::kNoStore;
   }
   const Outcome outcome = openAs(SqliteDatabase::Mode::kReadOnly);
-  // Reading needs a side file, which somebody who may not write to the directory cannot make. A writer has
-  // one there; without a writer the file does not change either.
+  // Reading needs a side file, which a user without write permission for the directory cannot make. While a
+  // daemon writes, the side file is there. Without one the file does not change, so that it can be read as it
+  // is.
   if (outcome != Outcome::kFailed || std::filesystem::exists(path_ + "-wal", error)) return outcome;
   return openAs(SqliteDatabase::Mode::kImmutable);
 }

@@ -40,13 +40,14 @@ struct PowerRow {
   std::size_t bytes() const { return sizeof(PowerRow) + payload.bytes(); }
 };
 
-// A real-time-communication session. Its rows share it, so that each finds the session's identifier.
+// A real-time-communication session. The rows of its messages share it, because each needs its identifier.
 struct RtcSessionRecord {
   double startedAt = 0.0;  // seconds since 1970
   ValueMap sessionInfo;
   ValueMap userInfo;
 
-  // Where the store keeps it: the row's identifier, in which of the files that it wrote. The writer's alone.
+  // Where the store keeps it: the row's identifier, and in which of the files that it wrote. Only the writer
+  // uses this.
   struct Place {
     std::int64_t identifier = 0;
     std::uint64_t file = 0;
@@ -62,7 +63,7 @@ struct RtcSessionRow {
   }
 };
 
-// One of its messages.
+// One message of such a session.
 struct RtcMessageRow {
   double sentAt = 0.0;  // seconds since 1970
   std::shared_ptr<RtcSessionRecord> session;
@@ -73,7 +74,7 @@ struct RtcMessageRow {
   std::size_t bytes() const { return sizeof(RtcMessageRow) + payload.bytes(); }
 };
 
-// What the store writes as one row of one of its tables.
+// A row of one of the store's tables.
 using StoreRow = std::variant<AnalyticsRow, MetricRow, PowerRow, RtcSessionRow, RtcMessageRow>;
 
 inline std::size_t bytesOf(const StoreRow& row) {

@@ -4,9 +4,9 @@
 namespace tonewerk {
 namespace {
 
-// Lean on purpose: a commit of a single message then writes a single page. An index on time would cost a
-// second one, AUTOINCREMENT a third; instead, the newest row of a table is never deleted, so that identifiers
-// only grow.
+// The tables have few indexes, so that a commit of a single message writes a single page. An index on time
+// would cost a second page and AUTOINCREMENT a third. Instead of AUTOINCREMENT, the newest row of a table is
+// never deleted, so that identifiers only grow.
 constexpr std::string_view kTables = R"(
   CREATE TABLE analytics_row (
     id INTEGER PRIMARY KEY, recorded_at REAL NOT NULL, name_set INTEGER NOT NULL, payload TEXT NOT NULL);
@@ -27,8 +27,7 @@ constexpr std::string_view kTables = R"(
     category INTEGER NOT NULL, type INTEGER NOT NULL, payload TEXT NOT NULL);
 )";
 
-// CROSS JOIN keeps the rows outermost, so that events come in the order of their identifiers without being
-// sorted.
+// CROSS JOIN keeps the rows outermost. So events come in the order of their identifiers and are not sorted.
 constexpr std::string_view kAnalyticsView = R"(
   CREATE VIEW analytics_event (id, recorded_at, name, payload) AS
     SELECT r.id * 2 + n.position, r.recorded_at, n.name, r.payload

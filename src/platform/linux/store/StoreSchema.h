@@ -8,20 +8,21 @@
 
 namespace tonewerk {
 
-// The report store's file, its tables and views. docs/store.md explains them to those who query them.
+// The report store's file with its tables and views. docs/store.md explains them to those who query them.
 
 inline constexpr std::string_view kStoreFileName = "reports.db";
 inline constexpr std::int64_t kStoreSchemaVersion = 1;
 
-// An analytics event's identifier is its row's times this, plus the place of its name among the row's names.
+// An analytics event's identifier is its row's identifier times this, plus the position of its name in the
+// row.
 inline constexpr std::int64_t kStoreNamesPerRow = 2;
 
-// A table that grows by rows with ever higher identifiers.
+// A table whose new rows have ever higher identifiers.
 struct StoreTable {
   std::string_view name;
-  std::string_view time;   // the column that says when a row was recorded
-  std::string_view bytes;  // an expression: what a row holds, without what is small in every row
-  std::string_view empty;  // an assignment: it holds nothing of that any more
+  std::string_view time;   // the column with the time of recording
+  std::string_view bytes;  // an expression: the size of what may be large in a row
+  std::string_view empty;  // an assignment that removes that from a row
 };
 
 inline constexpr std::array<StoreTable, 5> kStoreTables{{
@@ -33,7 +34,7 @@ inline constexpr std::array<StoreTable, 5> kStoreTables{{
     {"rtc_message", "sent_at", "length(CAST(payload AS BLOB))", "payload = '{}'"},
 }};
 
-// Makes all of it in an empty database, user_version included. One transaction.
+// The SQL that makes the schema in an empty database, user_version included, in one transaction.
 std::string storeSchema();
 
 }  // namespace tonewerk

@@ -15,19 +15,19 @@ namespace {
 constexpr std::int64_t kMinWalBytes = 256 << 10;
 constexpr std::int64_t kMaxWalBytes = 8 << 20;
 
-// Rows of each table that one statement deletes for their age, rows of all tables that one round deletes for
-// their size, and how many such rounds make a slice.
+// One statement deletes so many rows of a table for their age. One round deletes so many rows of all tables,
+// or bytes, for their size. A slice is so many rounds.
 constexpr std::int64_t kChunkRows = 500;
 constexpr int kRowsPerRound = 2000;
 constexpr std::int64_t kBytesPerRound = 2 << 20;
 constexpr int kRoundsPerSlice = 16;
-// Pages that a slice gives back.
+// A slice gives so many pages back.
 constexpr std::int64_t kVacuumPages = 512;
-// Fewer free pages than this are left for new rows in any case.
+// At least so many free pages stay for new rows, unless the file is too large.
 constexpr std::int64_t kSpareFreePages = 64;
 
-// Oldest by identifier, which the clock cannot turn round. The newest row stays, so that its identifier is
-// not given out again: a reader that goes on behind the last one it saw misses nothing.
+// Orders by identifier, which changes of the clock do not affect. The newest row stays, so that its
+// identifier is not used again: a reader that continues after the last row it saw misses none.
 std::string oldestRows(const StoreTable& table, const std::string& columns) {
   const std::string name(table.name);
   return "SELECT " + columns + " FROM " + name + " WHERE id < (SELECT max(id) FROM " + name + ") ORDER BY id";
@@ -37,7 +37,7 @@ std::string oldestChunk(const StoreTable& table) {
   return oldestRows(table, "id") + " LIMIT " + std::to_string(kChunkRows);
 }
 
-// Goes through one table from its oldest row on.
+// Walks through one table, from its oldest row on.
 class OldestRows {
  public:
   OldestRows(SqliteDatabase& database, const StoreTable& table)
@@ -50,18 +50,19 @@ class OldestRows {
   bool hasRow() const { return at_ == SqliteStatement::Step::kRow; }
   double time() const { return select_.number(1); }
 
-  // Goes on behind the current row, which is then among those to be deleted. The bytes that it holds.
+  // Moves to the next row, and marks the current one for deletion. Returns the bytes that the current row
+  // holds.
   std::int64_t pass() {
     passed_ = select_.integer(0);
     const std::int64_t bytes = select_.integer(2) + kLeastRowBytes;
     step();
     return bytes;
   }
-  // The identifier up to which rows were passed; none is 0.
+  // The identifier of the last marked row; 0 when there is none.
   std::int64_t passed() const { return passed_; }
 
  private:
-  // Identifier, time, lengths of the columns.
+  // The least bytes of a row: its identifier, its time and the lengths of its columns.
   static constexpr std::int64_t kLeastRowBytes = 16;
 
   void step() { at_ = select_.step(); }
@@ -71,7 +72,7 @@ class OldestRows {
   std::int64_t passed_ = 0;
 };
 
-// The one whose next row is the oldest of all; null where no row is left.
+// The table whose current row is the oldest of all. Null when no row is left.
 OldestRows* oldestOf(std::vector<OldestRows>& tables) {
   OldestRows* oldest = nullptr;
   for (OldestRows& table : tables) {
@@ -99,7 +100,7 @@ StoreTrimmer::Outcome StoreTrimmer::trimSize(const StoreBounds& bounds) {
 }
 
 StoreTrimmer::Outcome StoreTrimmer::deleteForSize(std::int64_t fileBytes) {
-  // What is deleted in one go makes room for a while: a 32nd of the file.
+  // The space that is freed at once lasts for a while: it is a 32nd of the file.
   const std::int64_t high = fileBytes - fileBytes / 32;
   const std::int64_t low = high - fileBytes / 32;
   for (int round = 0; round < kRoundsPerSlice; ++round) {
@@ -110,17 +111,17 @@ StoreTrimmer::Outcome StoreTrimmer::deleteForSize(std::int64_t fileBytes) {
     const std::optional<bool> hasEmptied = emptyNewest(low);
     if (!hasEmptied) return Outcome::kFailed;
     if (*hasEmptied) continue;
-    // A row takes less than twice its bytes in pages, so half of what is over is never too much.
+    // A row takes less than twice its bytes in pages, so half of the excess is never too much.
     const std::int64_t deleted = deleteOldest(std::clamp((used - low) / 2, pageBytes_, kBytesPerRound));
     if (deleted < 0) return Outcome::kFailed;
-    if (deleted == 0) return Outcome::kDone;  // nothing left to delete
+    if (deleted == 0) return Outcome::kDone;  // no row is left to delete
   }
   return Outcome::kMoreToDo;
 }
 
 StoreTrimmer::Outcome StoreTrimmer::vacuum(std::int64_t fileBytes) {
   if (!measure()) return Outcome::kFailed;
-  // Moving pages costs writes, so free ones stay for new rows unless the file is too large or mostly empty.
+  // Moving pages costs writes. So free pages stay for new rows, unless the file is too large or mostly empty.
   const std::int64_t spare = std::max(pages_ / 4, kSpareFreePages);
   const std::int64_t over = pages_ - fileBytes / pageBytes_;
   const std::int64_t wanted = std::min(freePages_, std::max(freePages_ - spare, over));
@@ -128,7 +129,8 @@ StoreTrimmer::Outcome StoreTrimmer::vacuum(std::int64_t fileBytes) {
   const std::int64_t pages = std::min(wanted, kVacuumPages);
   if (!database_.run("PRAGMA incremental_vacuum(" + std::to_string(pages) + ")")) return Outcome::kFailed;
   if (pages < wanted) return Outcome::kMoreToDo;
-  // The file itself only gets shorter with a checkpoint. One that a reader holds up is made later, by SQLite.
+  // Only a checkpoint makes the file itself shorter. When a reader prevents it, SQLite makes one later; its
+  // failure is therefore ignored.
   (void)database_.run("PRAGMA wal_checkpoint(PASSIVE)");
   return Outcome::kDone;
 }
@@ -144,8 +146,8 @@ bool StoreTrimmer::measure() {
   return true;
 }
 
-// Deletes what is not younger than `time` of the oldest chunk of every table. The number of rows, negative on
-// failure.
+// Deletes, of the oldest chunk of every table, the rows that are not younger than `time`. Returns the number
+// of rows, or a negative number on failure.
 std::int64_t StoreTrimmer::deleteUpTo(double time) {
   std::int64_t deleted = 0;
   for (const StoreTable& table : kStoreTables) {
@@ -159,11 +161,11 @@ std::int64_t StoreTrimmer::deleteUpTo(double time) {
   return deleted;
 }
 
-// The newest rows, which are never deleted, may be too large for the bound. The largest of them is then
-// emptied, or all others would be deleted in vain. Whether one was; none on failure.
-std::optional<bool> StoreTrimmer::emptyNewest(std::int64_t mostBytes) {
+// The newest rows are never deleted and may be too large for the bound. Then this empties the largest of
+// them, because deleting all others would not help. True when it emptied one; none on failure.
+std::optional<bool> StoreTrimmer::emptyNewest(std::int64_t maxBytes) {
   std::int64_t sum = 0;
-  std::int64_t most = 0;
+  std::int64_t largest = 0;
   std::string emptyLargest;
   for (const StoreTable& table : kStoreTables) {
     const std::string name(table.name);
@@ -176,17 +178,17 @@ std::optional<bool> StoreTrimmer::emptyNewest(std::int64_t mostBytes) {
     if (step == SqliteStatement::Step::kDone) continue;
     const std::int64_t held = select.integer(0);
     sum += held;
-    if (held <= most) continue;
-    most = held;
+    if (held <= largest) continue;
+    largest = held;
     emptyLargest = "UPDATE ";
     emptyLargest.append(name).append(" SET ").append(table.empty).append(newest);
   }
-  if (sum <= mostBytes) return false;
+  if (sum <= maxBytes) return false;
   return database_.run(emptyLargest) ? std::optional(true) : std::nullopt;
 }
 
-// Deletes the oldest rows of all tables until they come to `bytes`, or a round is full. The number of rows,
-// negative on failure.
+// Deletes the oldest rows of all tables until they come to `bytes` or a round is full. Returns the number of
+// rows, or a negative number on failure.
 std::int64_t StoreTrimmer::deleteOldest(std::int64_t bytes) {
   std::vector<OldestRows> tables;
   tables.reserve(kStoreTables.size());
@@ -202,7 +204,7 @@ std::int64_t StoreTrimmer::deleteOldest(std::int64_t bytes) {
   }
   std::transform(tables.begin(), tables.end(), ends.begin(),
                  [](const OldestRows& table) { return table.passed(); });
-  tables.clear();  // nothing may be read from a table whose rows go
+  tables.clear();  // ends their reads before the rows are deleted
 
   std::int64_t deleted = 0;
   for (std::size_t at = 0; at < ends.size(); ++at) {
