@@ -10,7 +10,7 @@
 
 namespace tonewerk {
 
-// Keeps the events that were recorded. Every event is used until the test narrows it down. Any thread.
+// Keeps the events that were recorded. Every event is used until the test limits them. Any thread.
 //
 //   metricon.useOnly({"com.orvane.audio.*"});
 //   EXPECT_THAT(metricon.eventsNamed("com.orvane.audio.volume"), SizeIs(1));
@@ -21,10 +21,10 @@ class MemoryMetricon final : public Metricon {
     ValueMap payload;
   };
 
-  // Each name that is used makes an event of its own.
+  // Keeps one event for each name that is used.
   void sendEvent(const EventNames& names, const UniqueFunction<ValueMap()>& payload) override;
 
-  // From now on only events that match one of these glob patterns, or the predicate, are used.
+  // After this only events are used that match one of the glob patterns, or the predicate.
   void useOnly(std::vector<std::string> patterns);
   void useOnly(std::function<bool(std::string_view name)> isUsed);
 

@@ -18,13 +18,13 @@
 
 namespace tonewerk {
 
-// A message of a stream: seconds, then what it says.
+// A message of a stream: its time in seconds, and what it says.
 struct Step {
   double at;
   ValueMap says;
 };
 
-// A stream and the summaries expected of it, in a short form that a reader can check by eye.
+// A stream and its expected summaries, in a short form that a reader can check by eye.
 struct StreamCase {
   std::string name;
   std::vector<Step> stream;
@@ -34,13 +34,15 @@ struct StreamCase {
 inline const Value kOn(true);
 inline const Value kOff(false);
 
-// The fixture of the tests of producers of summaries: a session, streams to fold, and what all producers do alike.
+// The fixture of the tests of producers of summaries. It has a session, makes streams of messages, and checks
+// what all producers have in common.
 class ProducerTest : public ReportingTest {
  protected:
   explicit ProducerTest(Classes workerClasses)
       : ReportingTest(std::move(workerClasses)), session(makeSession()) {}
 
-  // What the producer makes of stored messages. Intervals of half a second or less are too short.
+  // The summaries that the producer makes of stored messages. Intervals of half a second or less are too
+  // short.
   virtual TWReportingSessionMessages summariesOf(const TWReportingSessionMessages& messages) = 0;
   // A summary in the short form of StreamCase.
   virtual std::string shortFormOf(const ValueMap& summary) const = 0;
@@ -58,7 +60,7 @@ class ProducerTest : public ReportingTest {
   }
 
   // For properties: a short stream of messages a second apart, with some of `keys` and values of every kind.
-  // Most of it makes sense, so that there are summaries; the times are among the keys.
+  // Most messages make sense, so that there are summaries. The times are among the keys.
   static TWReportingSessionMessages anyStream(std::vector<std::string> keys) {
     const auto anyValue = rc::gen::weightedOneOf<Value>(
         {{8, rc::gen::map(rc::gen::arbitrary<bool>(), [](bool b) { return Value(b); })},
@@ -100,7 +102,7 @@ class ProducerTest : public ReportingTest {
     EXPECT_FALSE(workerClass.handleSingleMessageSession);
   }
 
-  // `steps` yield two summaries.
+  // `steps` must yield two summaries.
   void expectNumbersAndACount(const std::vector<Step>& steps) {
     const auto summaries = summariesOf(stream(steps));
     EXPECT_THAT(textsUnder("msgidx", summaries), ::testing::ElementsAre("1", "2"));
@@ -108,7 +110,7 @@ class ProducerTest : public ReportingTest {
     EXPECT_EQ(summaries[0]->message.find("msgcnt")->kind(), Value::Kind::kUnsigned);
   }
 
-  // `start` begins an interval that `stop` ends.
+  // `start` must begin an interval that `stop` ends.
   void expectSinglePrecision(const ValueMap& start, const ValueMap& stop, const char* lengthKey) {
     const auto summaries = summariesOf(stream({{0, start}, {1.1, stop}}));
     ASSERT_THAT(summaries, ::testing::SizeIs(1));
@@ -128,15 +130,15 @@ class ProducerTest : public ReportingTest {
     EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kDefault), ::testing::IsEmpty());
   }
 
-  // All debug lines carry the producer's own source file.
+  // All debug lines must carry the producer's own source file.
   void expectDebugLinesOf(const std::string& file) {
     for (const auto& line : test.log.linesOf("twrr", LogLevel::kDebug)) {
       EXPECT_THAT(line.message, ::testing::StartsWith(file + ":"));
     }
   }
 
-  // A property: whatever a stream holds, the walk neither crashes nor reads the clock, and the stored messages are
-  // afterwards what `merge` makes of them. `check` gets each summary.
+  // A property: with any stream, the walk does not crash or read the clock. The stored messages are
+  // afterwards the same as after `merge`. `check` gets each summary.
   void checkAnyStream(std::vector<std::string> keys, const char* lengthKey,
                       const std::function<void(const TWReportingSessionMessages& messages)>& merge,
                       const std::function<void(const TWReportingSessionMessage& summary)>& check) {
@@ -156,7 +158,7 @@ class ProducerTest : public ReportingTest {
     }
   }
 
-  // What the producers of volume and input summaries do with rapid spatial messages.
+  // Merges rapid spatial messages as the producers of volume and input summaries do.
   static void mergeRapidSpatialMessages(const TWReportingSessionMessages& messages, double maxPauseSeconds) {
     const std::array<std::string_view, 2> keys{"spatial-audio-accessory-feature", "spatializationEnabled"};
     TWReportingSessionWorkerUtility::combineRapidMessages(messages, keys, maxPauseSeconds);

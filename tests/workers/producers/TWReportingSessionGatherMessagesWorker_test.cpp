@@ -59,22 +59,22 @@ INSTANTIATE_TEST_SUITE_P(
                    {{0, {{kRunning, kOn}, {kGather, 1}}}, {0.625, {{kRunning, kOff}}}},
                    {"0.625@unknown"}},
         StreamCase{"PlayedOutsideGather", {{0, {{kRunning, kOn}}}, {12, {{kRunning, kOff}}}}, {}},
-        StreamCase{"GatherIsNotOne",  // only 1 begins a stretch
+        StreamCase{"GatherIsNotOne",  // only 1 begins an interval
                    {{0, {{kRunning, kOn}, {kGather, 2}}}, {12, {{kRunning, kOff}}}},
                    {}},
-        StreamCase{"GatherIsOneAsText",  // a text reads as its number
+        StreamCase{"GatherIsOneAsText",  // a text counts as its number
                    {{0, {{kRunning, kOn}, {kGather, "1"}}}, {12, {{kRunning, kOff}}}},
                    {"12@unknown"}},
-        StreamCase{"JoinedBeforeTheStart",  // the start itself has to say so
+        StreamCase{"JoinedBeforeTheStart",  // the start itself must say 1
                    {{0, {{kGather, 1}}}, {1, {{kRunning, kOn}}}, {12, {{kRunning, kOff}}}},
                    {}},
-        StreamCase{"JoinedWhilePlaying",  // begins no stretch
+        StreamCase{"JoinedWhilePlaying",  // begins no interval
                    {{0, {{kRunning, kOn}}}, {4, {{kGather, 1}}}, {12, {{kRunning, kOff}}}},
                    {}},
-        StreamCase{"JoinedWhilePlayingAndStopsSayingSo",
+        StreamCase{"JoinedWhilePlayingAndTheStopSaysSo",
                    {{0, {{kRunning, kOn}}}, {4, {{kGather, 1}}}, {12, {{kRunning, kOff}, {kGather, 1}}}},
                    {}},
-        StreamCase{"JoinedWhilePlayingThenChangedDevices",  // the change begins one
+        StreamCase{"JoinedWhilePlayingThenChangedDevices",  // the change begins an interval
                    {{0, {{kRunning, kOn}}},
                     {4, {{kGather, 1}}},
                     {6, {{kDevices, "Speaker"}}},
@@ -85,10 +85,10 @@ INSTANTIATE_TEST_SUITE_P(
                     {4, {{kDevices, "Headphones"}}},
                     {12, {{kRunning, kOff}}}},
                    {"4@Speaker", "8@Headphones"}},
-        StreamCase{"SelectedFormatChanged",  // also from the one it was not known by
+        StreamCase{"SelectedFormatChanged",  // also from the default
                    {{0, {{kRunning, kOn}, {kGather, 1}}}, {4, {{kFormat, "A"}}}, {12, {{kRunning, kOff}}}},
                    {"4@unknown", "8@unknown"}},
-        StreamCase{"SelectedFormatSaidAgain",
+        StreamCase{"SelectedFormatRepeated",
                    {{0, {{kRunning, kOn}, {kGather, 1}, {kFormat, "A"}}},
                     {4, {{kFormat, "A"}}},
                     {12, {{kRunning, kOff}}}},
@@ -106,10 +106,10 @@ INSTANTIATE_TEST_SUITE_P(
                     {5, {{kRunning, kOn}, {kGather, 1}}},
                     {7, {{kRunning, kOff}}}},
                    {"3@unknown", "2@Speaker"}},
-        StreamCase{"LeftWithoutAWordOnOutput",  // closes nothing
+        StreamCase{"LeftInAMessageThatDoesNotMentionOutput",  // ends nothing
                    {{0, {{kRunning, kOn}, {kGather, 1}}}, {4, {{kGather, 0}}}, {12, {{kRunning, kOff}}}},
                    {"12@unknown"}},
-        StreamCase{"LeftTwice",  // the second time the stretch was in no Gather session any more
+        StreamCase{"LeftTwice",  // the second time the interval is no longer in a Gather session
                    {{0, {{kRunning, kOn}, {kGather, 1}}},
                     {4, {{kGather, 0}}},
                     {6, {{kGather, 0}}},
@@ -126,7 +126,7 @@ INSTANTIATE_TEST_SUITE_P(
                     {4, {{kRunning, kOn}, {kGather, 0}}},
                     {12, {{kRunning, kOff}}}},
                    {"4@unknown", "8@unknown"}},
-        StreamCase{"StartedAgainWithoutAWordOnGather",
+        StreamCase{"StartedAgainInAMessageThatDoesNotMentionGather",
                    {{0, {{kRunning, kOn}, {kGather, 1}}}, {4, {{kRunning, kOn}}}, {12, {{kRunning, kOff}}}},
                    {"4@unknown", "8@unknown"}},
         StreamCase{"StartedAgainInGather",
@@ -140,13 +140,13 @@ INSTANTIATE_TEST_SUITE_P(
         StreamCase{"EndedByTheSessionsDuration",
                    {{0, {{kRunning, kOn}, {kGather, 1}}}, {10, {{"session_duration", 10.0}}}},
                    {"10@unknown"}},
-        StreamCase{"DurationSaysStillRunning",  // a stretch closes and the next one begins
+        StreamCase{"DurationSaysStillRunning",  // one interval ends and the next one begins
                    {{0, {{kRunning, kOn}, {kGather, 1}}},
                     {10, {{"session_duration", 10.0}, {kRunning, kOn}, {kGather, 1}}},
                     {12, {{kRunning, kOff}}}},
                    {"10@unknown", "2@unknown"}},
         StreamCase{"NeverStopped", {{0, {{kRunning, kOn}, {kGather, 1}}}, {4, {{"other", 1}}}}, {}},
-        StreamCase{"ShortStretchesInBetween",
+        StreamCase{"ShortIntervalsInBetween",
                    {{0, {{kRunning, kOn}, {kGather, 1}, {kDevices, "A"}}},
                     {2, {{kDevices, "B"}}},
                     {2.25, {{kDevices, "C"}}},
@@ -159,7 +159,7 @@ TEST_F(GatherMessagesTest, IsAProducerFromTheSessionsStart) {
   expectAProducerFromTheSessionsStart(TWReportingSessionGatherMessagesWorker::kWorkerClass);
 }
 
-TEST_F(GatherMessagesTest, ASummaryHoldsTheContextOfTheClosingStretch) {
+TEST_F(GatherMessagesTest, ASummaryHoldsTheContextOfTheEndingInterval) {
   const auto summaries = summariesOf(stream({{0,
                                               {{kRunning, kOn},
                                                {kGather, 1},
@@ -178,7 +178,7 @@ TEST_F(GatherMessagesTest, ASummaryHoldsTheContextOfTheClosingStretch) {
   EXPECT_EQ(summaries[0]->message.find("msgidx")->kind(), Value::Kind::kInteger);
 }
 
-TEST_F(GatherMessagesTest, WhatIsNotKnownHasItsDefault) {
+TEST_F(GatherMessagesTest, UnknownValuesHaveTheirDefaults) {
   const auto summaries = summariesOf(stream({{0, {{kRunning, kOn}, {kGather, 1}}}, {1, {{kRunning, kOff}}}}));
   ASSERT_THAT(summaries, SizeIs(1));
   EXPECT_EQ(summaries[0]->message.text(),
@@ -208,23 +208,23 @@ TEST_F(GatherMessagesTest, WithoutTimesThereIsNoSummary) {
   expectNoSummaryWithoutTimes({{kRunning, kOn}, {kGather, 1}}, {{kRunning, kOff}});
 }
 
-TEST_F(GatherMessagesTest, AnOpenStretchInThePreviousValuesGoesOn) {
+TEST_F(GatherMessagesTest, AnOpenIntervalInThePreviousValuesContinues) {
   session->addPreviousValues(
       {{kRunning, kOn}, {kGather, 1}, {kDevices, "Speaker"}, {"twreporting_timestamp", 4.0}});
   EXPECT_THAT(shortFormsOf({{10, {{kRunning, kOff}}}}), ElementsAre("6@Speaker"));
 }
 
-TEST_F(GatherMessagesTest, AnOpenStretchOutsideGatherInThePreviousValuesYieldsNoSummary) {
+TEST_F(GatherMessagesTest, AnOpenIntervalOutsideGatherInThePreviousValuesYieldsNoSummary) {
   session->addPreviousValues({{kRunning, kOn}, {"twreporting_timestamp", 4.0}});
   EXPECT_THAT(shortFormsOf({{10, {{kRunning, kOff}}}}), IsEmpty());
 }
 
-TEST_F(GatherMessagesTest, AnyValueUnderGatherSessionIsEnoughForAnOpenStretch) {
+TEST_F(GatherMessagesTest, AnyValueUnderGatherSessionIsEnoughForAnOpenInterval) {
   session->addPreviousValues({{kRunning, kOn}, {kGather, 0}, {"twreporting_timestamp", 4.0}});
   EXPECT_THAT(shortFormsOf({{10, {{kRunning, kOff}}}}), ElementsAre("6@unknown"));
 }
 
-TEST_F(GatherMessagesTest, RapidSpatialMessagesStayApart) {
+TEST_F(GatherMessagesTest, RapidSpatialMessagesAreNotMerged) {
   const auto messages = stream({{0, {{kRunning, kOn}, {kGather, 1}}},
                                 {2, {{"spatial-audio-accessory-feature", true}}},
                                 {2.5, {{"spatializationEnabled", true}, {kDevices, "A"}}},
@@ -242,17 +242,18 @@ TEST_F(GatherMessagesTest, StopSendsTheSummariesIntoTheSession) {
   const auto events = test.metricon.eventsNamed("com.orvane.tonewerk.Gather.Summary");
   ASSERT_THAT(events, SizeIs(1));
   EXPECT_EQ(events[0].number("play_seconds"), 3.0);
-  EXPECT_EQ(events[0].text("HostApplicationDisplayID"), "Unknown");  // as of any message without one
+  EXPECT_EQ(events[0].text("HostApplicationDisplayID"),
+            "Unknown");  // like any message without an application
   EXPECT_EQ(events[0].text("audiotag"), "GatherSummary");
   EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kDefault),
               ElementsAre("sending gather event for reporter 77"));
 }
 
-TEST_F(GatherMessagesTest, AStopWithoutSummariesSendsAndSaysNothing) {
+TEST_F(GatherMessagesTest, AStopWithoutSummariesSendsAndLogsNothing) {
   expectNothingOfAStopWithoutSummaries();
 }
 
-TEST_F(GatherMessagesTest, SaysWhatItDoesWithEachStretch) {
+TEST_F(GatherMessagesTest, LogsWhatItDoesWithEachInterval) {
   test.log.clear();
   shortFormsOf({{0, {{kRunning, kOn}, {kGather, 1}}}, {2, {{kDevices, "A"}}}, {2.25, {{kRunning, kOff}}}});
   EXPECT_THAT(

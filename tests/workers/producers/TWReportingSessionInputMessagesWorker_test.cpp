@@ -34,7 +34,7 @@ class InputMessagesTest : public ProducerTest {
     return worker.createInputMessages(messages, &process, 0.5);
   }
 
-  // With the vocoders behind a space.
+  // The vocoders come after a space.
   std::string shortFormOf(const ValueMap& summary) const override {
     const std::string text = summary.text("inputrunning_seconds") + "@" + summary.text("active_devices");
     return summary.contains("vocoders") ? text + " " + summary.text("vocoders") : text;
@@ -61,7 +61,7 @@ INSTANTIATE_TEST_SUITE_P(
         StreamCase{"RanForALittleMoreThanTheMinimum",
                    {{0, {{kRunning, kOn}}}, {0.625, {{kRunning, kOff}}}},
                    {"0.625@unknown"}},
-        StreamCase{"DevicesChangedWhileRunning",  // the closed summary has the old ones
+        StreamCase{"DevicesChangedWhileRunning",  // the first summary has the old devices
                    {{0, {{kRunning, kOn}, {kDevices, "Mic"}}},
                     {3, {{kDevices, "Headset"}}},
                     {10, {{kRunning, kOff}}}},
@@ -70,10 +70,10 @@ INSTANTIATE_TEST_SUITE_P(
                    {{0, {{kRunning, kOn}}}, {3, {{kDevices, "Mic"}}}, {10, {{kRunning, kOff}}}},
                    {"3@unknown", "7@Mic"}},
         StreamCase{
-            "DevicesSaidAgain",
+            "DevicesRepeated",
             {{0, {{kRunning, kOn}, {kDevices, "Mic"}}}, {3, {{kDevices, "Mic"}}}, {10, {{kRunning, kOff}}}},
             {"10@Mic"}},
-        StreamCase{"DevicesSaidAgainAsAnotherKindOfNumber",  // values are compared, not texts
+        StreamCase{"DevicesRepeatedAsAnotherKindOfNumber",  // values are compared, not texts
                    {{0, {{kRunning, kOn}, {kDevices, 1}}}, {3, {{kDevices, true}}}, {10, {{kRunning, kOff}}}},
                    {"10@1"}},
         StreamCase{"DevicesChangedWhileStopped",
@@ -101,7 +101,7 @@ INSTANTIATE_TEST_SUITE_P(
         StreamCase{"EndedByTheSessionsDuration",
                    {{0, {{kRunning, kOn}}}, {10, {{"session_duration", 10.0}}}, {12, {{kRunning, kOff}}}},
                    {"10@unknown"}},
-        StreamCase{"DurationSaysStillRunning",  // a stretch closes and the next one begins
+        StreamCase{"DurationSaysStillRunning",  // one interval ends and the next one begins
                    {{0, {{kRunning, kOn}}},
                     {10, {{"session_duration", 10.0}, {kRunning, kOn}}},
                     {12, {{kRunning, kOff}}}},
@@ -112,7 +112,7 @@ INSTANTIATE_TEST_SUITE_P(
                     {4, {{"session_selected_format", "D"}, {"mFormatID", "E"}}},
                     {10, {{kRunning, kOff}}}},
                    {"10@unknown"}},
-        StreamCase{"VocoderChanged",  // closes nothing
+        StreamCase{"VocoderChanged",  // ends nothing
                    {{0, {{kRunning, kOn}}},
                     {4, {{kVocoder, "Opus"}, {kRate, "16000.000000"}}},
                     {10, {{kRunning, kOff}}}},
@@ -144,7 +144,7 @@ INSTANTIATE_TEST_SUITE_P(
                     {4, {{kVocoder, "B"}, {kRate, "8000"}}},
                     {10, {{kRunning, kOff}}}},
                    {"10@unknown A:8000,B:8000"}},
-        StreamCase{"VocoderSaidAgain",
+        StreamCase{"VocoderRepeated",
                    {{0, {{kRunning, kOn}, {kVocoder, "A"}, {kRate, "8000"}}},
                     {3, {{kVocoder, "A"}, {kRate, "16000"}}},  // another rate is no change
                     {10, {{kRunning, kOff}}}},
@@ -155,7 +155,7 @@ INSTANTIATE_TEST_SUITE_P(
         StreamCase{"VocoderWithTheStop",
                    {{0, {{kRunning, kOn}}}, {9, {{kRunning, kOff}, {kVocoder, "A"}, {kRate, "8000"}}}},
                    {"9@unknown"}},
-        StreamCase{"VocodersOfTwoStretches",
+        StreamCase{"VocodersOfTwoIntervals",
                    {{0, {{kRunning, kOn}}},
                     {1, {{kVocoder, "A"}, {kRate, "8000"}}},
                     {4, {{kRunning, kOff}}},
@@ -163,7 +163,7 @@ INSTANTIATE_TEST_SUITE_P(
                     {6, {{kVocoder, "B"}, {kRate, "8000"}}},
                     {7, {{kRunning, kOff}}}},
                    {"4@unknown A:8000", "2@unknown B:8000"}},
-        StreamCase{"VocodersOfASkippedStretchGoToTheNext",
+        StreamCase{"VocodersOfASkippedIntervalAreInTheNextSummary",
                    {{0, {{kRunning, kOn}}},
                     {0.25, {{kVocoder, "A"}, {kRate, "8000"}}},
                     {0.5, {{kRunning, kOff}}},
@@ -172,7 +172,7 @@ INSTANTIATE_TEST_SUITE_P(
                     {8, {{kRunning, kOn}}},
                     {9, {{kRunning, kOff}}}},
                    {"2@unknown A:8000", "1@unknown"}},
-        StreamCase{"VocoderWithNewDevices",  // is listed in the stretch that the message closes
+        StreamCase{"VocoderWithNewDevices",  // is listed in the interval that the message ends
                    {{0, {{kRunning, kOn}}},
                     {4, {{kDevices, "Mic"}, {kVocoder, "A"}, {kRate, "8000"}}},
                     {10, {{kRunning, kOff}}}},
@@ -184,7 +184,7 @@ TEST_F(InputMessagesTest, IsAProducerFromTheSessionsStart) {
   expectAProducerFromTheSessionsStart(TWReportingSessionInputMessagesWorker::kWorkerClass);
 }
 
-TEST_F(InputMessagesTest, ASummaryHoldsTheContextOfTheClosingStretch) {
+TEST_F(InputMessagesTest, ASummaryHoldsTheContextOfTheEndingInterval) {
   const auto summaries =
       summariesOf(stream({{0,
                            {{kRunning, kOn},
@@ -205,7 +205,7 @@ TEST_F(InputMessagesTest, ASummaryHoldsTheContextOfTheClosingStretch) {
       R"("vp_config_input_port":"Port","active_devices":"Mic","vocoders":"Opus:48000.000000","msgcnt":1})");
 }
 
-TEST_F(InputMessagesTest, WhatIsNotKnownIsUnknownAndWithoutVocodersThereIsNoList) {
+TEST_F(InputMessagesTest, MissingValuesAreUnknownAndWithoutVocodersThereIsNoList) {
   const auto summaries = summariesOf(stream({{0, {{kRunning, kOn}}}, {1, {{kRunning, kOff}}}}));
   ASSERT_THAT(summaries, SizeIs(1));
   EXPECT_EQ(summaries[0]->message.text(),
@@ -241,7 +241,7 @@ TEST_F(InputMessagesTest, TheWalkBeginsWithThePreviousValues) {
   EXPECT_EQ(summaries[0]->message.text("vp_config_input_port"), "Port");
 }
 
-TEST_F(InputMessagesTest, InputThatThePreviousValuesShowRunningBeginsNoStretch) {
+TEST_F(InputMessagesTest, InputThatThePreviousValuesShowRunningBeginsNoInterval) {
   session->addPreviousValues({{kRunning, kOn}, {"twreporting_timestamp", 0.0}});
   EXPECT_THAT(shortFormsOf({{10, {{kRunning, kOff}}}}), IsEmpty());
   EXPECT_THAT(shortFormsOf({{10, {{kRunning, kOn}}}, {20, {{kRunning, kOff}}}}), IsEmpty());
@@ -296,11 +296,11 @@ TEST_F(InputMessagesTest, StopSendsTheSummariesIntoTheSession) {
               ElementsAre("sending input summary event for reporter 77"));
 }
 
-TEST_F(InputMessagesTest, AStopWithoutSummariesSendsAndSaysNothing) {
+TEST_F(InputMessagesTest, AStopWithoutSummariesSendsAndLogsNothing) {
   expectNothingOfAStopWithoutSummaries();
 }
 
-TEST_F(InputMessagesTest, SaysWhatItDoesWithEachStretch) {
+TEST_F(InputMessagesTest, LogsWhatItDoesWithEachInterval) {
   test.log.clear();
   shortFormsOf({{0, {{kRunning, kOn}}}, {2, {{kDevices, "Mic"}}}, {2.25, {{kRunning, kOff}}}});
   EXPECT_THAT(

@@ -70,20 +70,21 @@ INSTANTIATE_TEST_SUITE_P(
                     {5, {{kRunning, kOn}}},
                     {7, {{kRunning, kOff}}}},
                    {"3@0.5", "2@0.8"}},
-        StreamCase{"VolumeCameAfterTheStart",  // the stretch has no volume until then, so it goes on
+        StreamCase{"VolumeCameAfterTheStart",  // until then the interval has no volume, so it continues
                    {{0, {{kRunning, kOn}}}, {3, {{kVolume, 0.5}}}, {10, {{kRunning, kOff}}}},
                    {"10@0.5"}},
         StreamCase{"WithoutAVolume", {{0, {{kRunning, kOn}}}, {10, {{kRunning, kOff}}}}, {}},
-        StreamCase{"StoppedWithANewVolume",  // the closing message's context is the next stretch's
-                   {{0, {{kRunning, kOn}, {kVolume, 0.5}}}, {10, {{kRunning, kOff}, {kVolume, 0.9}}}},
-                   {"10@0.5"}},
+        StreamCase{
+            "StoppedWithANewVolume",  // the context of the message that ends an interval is the next one's
+            {{0, {{kRunning, kOn}, {kVolume, 0.5}}}, {10, {{kRunning, kOff}, {kVolume, 0.9}}}},
+            {"10@0.5"}},
         StreamCase{"StartedAgainWhilePlaying",
                    {{0, {{kRunning, kOn}, {kVolume, 0.5}}}, {4, {{kRunning, kOn}}}, {10, {{kRunning, kOff}}}},
                    {"10@0.5"}},
         StreamCase{"EndedByTheSessionsDuration",
                    {{0, {{kRunning, kOn}, {kVolume, 0.5}}}, {10, {{"session_duration", 10.0}}}},
                    {"10@0.5"}},
-        StreamCase{"DurationSaysStillRunning",  // a stretch closes and the next one begins
+        StreamCase{"DurationSaysStillRunning",  // one interval ends and the next one begins
                    {{0, {{kRunning, kOn}, {kVolume, 0.5}}},
                     {10, {{"session_duration", 10.0}, {kRunning, kOn}}},
                     {12, {{kRunning, kOff}}}},
@@ -114,7 +115,7 @@ INSTANTIATE_TEST_SUITE_P(
                     {6, {{"spatial-audio-accessory-feature", true}}},
                     {10, {{kRunning, kOff}}}},
                    {"10@0.5"}},
-        StreamCase{"ShortStretchesInBetween",
+        StreamCase{"ShortIntervalsInBetween",
                    {{0, {{kRunning, kOn}, {kVolume, 0.1}}},
                     {2, {{kVolume, 0.2}}},
                     {2.25, {{kVolume, 0.3}}},
@@ -123,7 +124,7 @@ INSTANTIATE_TEST_SUITE_P(
         StreamCase{"TimesGoBack", {{10, {{kRunning, kOn}, {kVolume, 0.5}}}, {2, {{kRunning, kOff}}}}, {}}),
     [](const auto& tested) { return tested.param.name; });
 
-TEST_F(VolumeMessagesTest, ASummaryHoldsTheContextOfTheClosingStretch) {
+TEST_F(VolumeMessagesTest, ASummaryHoldsTheContextOfTheEndingInterval) {
   const auto summaries = summariesOf(stream({{0,
                                               {{kRunning, kOn},
                                                {kVolume, 0.3},
@@ -145,7 +146,7 @@ TEST_F(VolumeMessagesTest, ASummaryHoldsTheContextOfTheClosingStretch) {
       R"("msgidx":1,"msgcnt":1})");
 }
 
-TEST_F(VolumeMessagesTest, WhatIsNotKnownHasItsDefault) {
+TEST_F(VolumeMessagesTest, UnknownValuesHaveTheirDefaults) {
   const auto summaries = summariesOf(stream({{0, {{kRunning, kOn}, {kVolume, 1}}}, {1, {{kRunning, kOff}}}}));
   ASSERT_THAT(summaries, SizeIs(1));
   const ValueMap& summary = summaries[0]->message;
@@ -178,7 +179,7 @@ TEST_F(VolumeMessagesTest, WithoutTimesThereIsNoSummary) {
   expectNoSummaryWithoutTimes({{kRunning, kOn}, {kVolume, 0.5}}, {{kRunning, kOff}});
 }
 
-TEST_F(VolumeMessagesTest, AnOpenStretchInThePreviousValuesYieldsNoSummaryByItself) {
+TEST_F(VolumeMessagesTest, AnOpenIntervalInThePreviousValuesYieldsNoSummaryByItself) {
   session->addPreviousValues({{kRunning, kOn}, {kVolume, 0.5}, {"twreporting_timestamp", 0.0}});
   EXPECT_THAT(shortFormsOf({{10, {{kRunning, kOff}}}}), IsEmpty());
 }
@@ -226,11 +227,11 @@ TEST_F(VolumeMessagesTest, StopSendsTheSummariesIntoTheSession) {
               ElementsAre("sending volume event for reporter 77"));
 }
 
-TEST_F(VolumeMessagesTest, AStopWithoutSummariesSendsAndSaysNothing) {
+TEST_F(VolumeMessagesTest, AStopWithoutSummariesSendsAndLogsNothing) {
   expectNothingOfAStopWithoutSummaries();
 }
 
-TEST_F(VolumeMessagesTest, SaysWhatItDoesWithEachStretch) {
+TEST_F(VolumeMessagesTest, LogsWhatItDoesWithEachInterval) {
   test.log.clear();
   shortFormsOf({{0, {{kRunning, kOn}, {kVolume, 0.5}}}, {2, {{kVolume, 0.75}}}, {2.25, {{kRunning, kOff}}}});
   EXPECT_THAT(

@@ -32,7 +32,7 @@ class SummaryJsonFileTest : public ReportingTest {
     file.closeFile();
     return test.files.contents(kPath).value_or("no file");
   }
-  // The file's lines, those of an entry as its member's name.
+  // The file's lines. The lines of an entry are shown as the name of its member.
   std::vector<std::string> shapeOf(const std::vector<ValueMap>& payloads) {
     const std::string text = written(payloads);
     std::vector<std::string> shape;
@@ -54,27 +54,27 @@ class SummaryJsonFileTest : public ReportingTest {
   }
 };
 
-TEST_F(SummaryJsonFileTest, EntriesStandBetweenLinesOfCommas) {
+TEST_F(SummaryJsonFileTest, LinesOfCommasSeparateTheEntries) {
   EXPECT_THAT(shapeOf({kGood, kGood}), ElementsAre("[", "Setup_Start_1", ",", "Setup_Start_2", "]"));
 }
 
 TEST_F(SummaryJsonFileTest, WithoutAMessageThereIsNoFile) { EXPECT_EQ(written({}), "no file"); }
 
-TEST_F(SummaryJsonFileTest, AnEntryInTheMiddleThatJsonCannotSayIsAnEmptyLineWithoutAComma) {
+TEST_F(SummaryJsonFileTest, AMiddleEntryThatIsNotValidJsonIsAnEmptyLineWithoutAComma) {
   EXPECT_THAT(shapeOf({kGood, kUnsayable, kGood}),
               ElementsAre("[", "Setup_Start_1", "", ",", "Setup_Start_3", "]"));
 }
 
-TEST_F(SummaryJsonFileTest, AFirstEntryThatJsonCannotSayHasNoCommaBehindIt) {
+TEST_F(SummaryJsonFileTest, AFirstEntryThatIsNotValidJsonHasNoCommaAfterIt) {
   EXPECT_THAT(shapeOf({kUnsayable, kGood, kGood}),
               ElementsAre("[", "", "Setup_Start_2", ",", "Setup_Start_3", "]"));
 }
 
-TEST_F(SummaryJsonFileTest, ALastEntryThatJsonCannotSayHasNoCommaBeforeIt) {
+TEST_F(SummaryJsonFileTest, ALastEntryThatIsNotValidJsonHasNoCommaBeforeIt) {
   EXPECT_THAT(shapeOf({kGood, kUnsayable}), ElementsAre("[", "Setup_Start_1", "", "]"));
 }
 
-TEST_F(SummaryJsonFileTest, AFileOfNothingThatJsonCanSayIsAnEmptyArray) {
+TEST_F(SummaryJsonFileTest, AFileWithoutAValidEntryIsAnEmptyArray) {
   EXPECT_THAT(shapeOf({kUnsayable, kUnsayable}), ElementsAre("[", "", "", "]"));
 }
 
@@ -86,7 +86,7 @@ TEST_F(SummaryJsonFileTest, NanAndBothInfinitiesAtAnyDepthAreLoggedOnceEach) {
                           StartsWith("dataWithJSONObject: ")));
 }
 
-TEST_F(SummaryJsonFileTest, NothingIsSeenOfAFileThatIsNotClosed) {
+TEST_F(SummaryJsonFileTest, AFileThatIsNotClosedDoesNotAppear) {
   {
     SummaryJsonFile file(kDirectory, "a.json");
     file.writeMessage(kCategorySetup, kTypeStart, kGood);
@@ -96,7 +96,7 @@ TEST_F(SummaryJsonFileTest, NothingIsSeenOfAFileThatIsNotClosed) {
   EXPECT_EQ(test.files.openFiles(), 0);
 }
 
-TEST_F(SummaryJsonFileTest, ANameThatIsTakenWhileTheFileIsWrittenStaysWithWhoWasFaster) {
+TEST_F(SummaryJsonFileTest, ANameThatIsTakenWhileTheFileIsWrittenIsNotReplaced) {
   SummaryJsonFile file(kDirectory, "a.json");
   file.writeMessage(kCategorySetup, kTypeStart, kGood);
   test.files.addFile(kPath, "faster");
@@ -110,7 +110,7 @@ TEST_F(SummaryJsonFileTest, ANameThatIsTakenWhileTheFileIsWrittenStaysWithWhoWas
                           "SummaryJsonFileWorker closed file. action=close file=/logs/a-3.json"));
 }
 
-TEST_F(SummaryJsonFileTest, ANameThatItsNumberMakesTooLongCannotBeOpenedAndIsLogged) {
+TEST_F(SummaryJsonFileTest, ANameThatBecomesTooLongWithItsNumberCannotBeOpenedAndIsLogged) {
   const std::string name = std::string(250, 'a') + ".json";
   test.files.addFile("/logs/" + name, "");
   SummaryJsonFile file(kDirectory, name);

@@ -35,7 +35,7 @@ class TWReportingSessionDPWorkerTest : public ReportingTest {
   }
   ~TWReportingSessionDPWorkerTest() override {
     session.reset();
-    context.reset();  // its queue may still count posts
+    context.reset();  // its queue may still run code that counts posts
   }
 
   void configure(std::string_view key, const Value& value) {
@@ -51,7 +51,7 @@ class TWReportingSessionDPWorkerTest : public ReportingTest {
   static TWReportingSessionMessage overload(ValueMap payload) { return {std::move(payload), kIo, kError}; }
   static TWReportingSessionMessage overload() { return overload({{"smallest_buffer_frame_size", 512}}); }
 
-  // How often the notification was posted until now.
+  // How often the notification has been posted.
   int posts() {
     test.queues.runAll();
     return posts_;
@@ -197,7 +197,7 @@ TEST_F(TWReportingSessionDPWorkerTest, WithoutAnApplicationTheDescriptionIsThePl
   EXPECT_EQ(test.whirlcaps.requests()[0].description, "(null)");
 }
 
-TEST_F(TWReportingSessionDPWorkerTest, ABufferOf511FramesDoesNotTriggerOneOf512Does) {
+TEST_F(TWReportingSessionDPWorkerTest, ABufferOf512FramesTriggersOneOf511DoesNot) {
   switchOn();
   const auto worker = makeWorker();
   worker->handleMessage(overload({{"smallest_buffer_frame_size", 511}}));
@@ -244,7 +244,7 @@ TEST_F(TWReportingSessionDPWorkerTest, AnIoCycleBelowTheSettingDoesNotTriggerOne
   configure("io_cycle", 10);
   const auto worker = makeWorker();
   worker->handleMessage(overload({{"smallest_buffer_frame_size", 512}, {"io_cycle", 9}}));
-  worker->handleMessage(overload());  // none at all counts as 0
+  worker->handleMessage(overload());  // without the key it counts as 0
   EXPECT_EQ(requests(), 0U);
   worker->handleMessage(overload({{"smallest_buffer_frame_size", 512}, {"io_cycle", 10}}));
   EXPECT_EQ(requests(), 1U);
@@ -286,7 +286,7 @@ TEST_F(TWReportingSessionDPWorkerTest, TwoSessionsCanEachRequestWithinTheSameTen
   EXPECT_EQ(requests(), 2U);
 }
 
-TEST_F(TWReportingSessionDPWorkerTest, AMessageOfAnotherKindIsSaidNotToMeetTheConditions) {
+TEST_F(TWReportingSessionDPWorkerTest, AMessageOfAnotherKindIsLoggedAsNotMeetingTheConditions) {
   switchOn();
   const auto worker = makeWorker();
   test.log.clear();
@@ -303,7 +303,7 @@ TEST_F(TWReportingSessionDPWorkerTest, AMessageOfAnotherKindIsSaidNotToMeetTheCo
   EXPECT_EQ(posts(), 0);
 }
 
-TEST_F(TWReportingSessionDPWorkerTest, AnOverloadTooSoonIsSaidToBe) {
+TEST_F(TWReportingSessionDPWorkerTest, AnOverloadThatComesTooSoonIsLogged) {
   switchOn();
   const auto worker = makeWorker();
   test.clock.setNow(1000.0);
@@ -317,7 +317,7 @@ TEST_F(TWReportingSessionDPWorkerTest, AnOverloadTooSoonIsSaidToBe) {
                           "time diff : 4.000000, io cycle: 0"));
 }
 
-TEST_F(TWReportingSessionDPWorkerTest, ABufferSizeIsSaidAsItWasCompared) {
+TEST_F(TWReportingSessionDPWorkerTest, ABufferSizeIsLoggedAsItWasCompared) {
   switchOn();
   const auto worker = makeWorker();
   test.log.clear();
@@ -360,7 +360,7 @@ TEST_F(TWReportingSessionDPWorkerTest, TheTenSecondsCountFromBeforeTheWait) {
   EXPECT_EQ(requests(), 2U);
 }
 
-TEST_F(TWReportingSessionDPWorkerTest, AWaitTimeThatIsNoTimeIsNone) {
+TEST_F(TWReportingSessionDPWorkerTest, AnInvalidWaitTimeCountsAsZero) {
   switchOn();
   for (const Value& waitTime :
        {Value(-5.0), Value(std::nan("")), Value(-HUGE_VAL), Value(0.9), Value("soon")}) {
@@ -384,7 +384,7 @@ TEST_F(TWReportingSessionDPWorkerTest, NoWaitIsLongerThanTenSeconds) {
   }
 }
 
-TEST_F(TWReportingSessionDPWorkerTest, WhatDoesNotMeetTheConditionsIsNotWaitedFor) {
+TEST_F(TWReportingSessionDPWorkerTest, ThereIsNoWaitWhenTheConditionsAreNotMet) {
   switchOn();
   configure("wait_time", 1000);
   const auto worker = makeWorker();
@@ -393,7 +393,7 @@ TEST_F(TWReportingSessionDPWorkerTest, WhatDoesNotMeetTheConditionsIsNotWaitedFo
   EXPECT_EQ(test.clock.monotonic(), before);
 }
 
-TEST_F(TWReportingSessionDPWorkerTest, EveryWorkersCreationReadsTheSettingsOfAllAnew) {
+TEST_F(TWReportingSessionDPWorkerTest, EachNewWorkerReadsTheSettingsAgainForAll) {
   switchOn();
   const auto old = makeWorker();
   old->handleMessage(overload({{"smallest_buffer_frame_size", 64}}));
@@ -406,7 +406,7 @@ TEST_F(TWReportingSessionDPWorkerTest, EveryWorkersCreationReadsTheSettingsOfAll
   EXPECT_EQ(requests(), 1U);
 }
 
-TEST_F(TWReportingSessionDPWorkerTest, ANegativeSettingLetsEverythingThrough) {
+TEST_F(TWReportingSessionDPWorkerTest, WithNegativeSettingsEveryOverloadTriggers) {
   switchOn();
   configure("io_buffer_size", -1);
   makeWorker()->handleMessage(overload({}));

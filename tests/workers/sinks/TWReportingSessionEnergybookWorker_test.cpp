@@ -27,7 +27,7 @@ class TWReportingSessionEnergybookWorkerTest : public ReportingTest {
   bool handle(const ValueMap& payload, AudioEventType type = kEnergybook) {
     return worker.handleMessage(TWReportingSessionMessage(payload, 1, type));
   }
-  // The events sent, each as "group name payload".
+  // The events that were sent, each as "group name payload".
   std::vector<std::string> sent() const {
     std::vector<std::string> texts;
     for (const auto& event : test.energybook.events()) {
@@ -67,7 +67,7 @@ TEST_F(TWReportingSessionEnergybookWorkerTest, TheDurationIsPassedOnAsItIs) {
             Value(ValueMap{{"a", ValueArray{1}}}));
 }
 
-TEST_F(TWReportingSessionEnergybookWorkerTest, ADurationWithoutAnApplicationIsSentAndSaidToLackIt) {
+TEST_F(TWReportingSessionEnergybookWorkerTest, ADurationWithoutAnApplicationIsSentAndTheLackIsLogged) {
   handle({{"EngineOnTime", 3}, {"twreporting_timestamp", 100.0}});
   EXPECT_THAT(sent(), ElementsAre(R"(28 Flumen_Haptics_EngineOnDuration {"EngineOnDuration":3,)"
                                   R"("TimestampEnd":100.0})"));
@@ -81,7 +81,7 @@ TEST_F(TWReportingSessionEnergybookWorkerTest, ADurationOfAnApplicationCalledUnk
   EXPECT_THAT(errors(), ElementsAre("failed to get app name for energybook"));
 }
 
-TEST_F(TWReportingSessionEnergybookWorkerTest, ADurationWithoutATimeIsSentAndSaidToLackIt) {
+TEST_F(TWReportingSessionEnergybookWorkerTest, ADurationWithoutATimeIsSentAndTheLackIsLogged) {
   nameApplication("com.orvane.game");
   handle({{"EngineOnTime", 3}});
   EXPECT_THAT(sent(), ElementsAre(R"(28 Flumen_Haptics_EngineOnDuration {"EngineOnDuration":3,)"
@@ -114,7 +114,8 @@ TEST_F(TWReportingSessionEnergybookWorkerTest, EveryOtherStateIsOff) {
   EXPECT_THAT(test.energybook.events(), SizeIs(7));
 }
 
-TEST_F(TWReportingSessionEnergybookWorkerTest, AStatusWithoutApplicationAndTimeNamesItUnknownAndSaysNothing) {
+TEST_F(TWReportingSessionEnergybookWorkerTest,
+       AStatusWithoutApplicationAndTimeIsSentAsUnknownAndNothingIsLogged) {
   handle({{"EngineState", "EngineOn"}});
   EXPECT_THAT(sent(), ElementsAre(R"(28 Flumen_Haptics_ClientStatus {"Status":true,)"
                                   R"("ApplicationName":"Unknown"})"));
@@ -138,14 +139,14 @@ TEST_F(TWReportingSessionEnergybookWorkerTest, ALongSessionWithoutClientsIsSentW
   EXPECT_THAT(errors(), IsEmpty());
 }
 
-TEST_F(TWReportingSessionEnergybookWorkerTest, AMessageThatSpeaksOfAllThreeSendsThreeInOrder) {
+TEST_F(TWReportingSessionEnergybookWorkerTest, AMessageThatReportsAllThreeSendsThreeInOrder) {
   handle({{"Haptic_Active_Hardware_Time_Seconds", 3600}, {"EngineState", "EngineOff"}, {"EngineOnTime", 3}});
   EXPECT_THAT(sent(), ElementsAre(StartsWith("28 Flumen_Haptics_EngineOnDuration "),
                                   StartsWith("28 Flumen_Haptics_ClientStatus "),
                                   StartsWith("28 LeakedHapticsSessionInfo ")));
 }
 
-TEST_F(TWReportingSessionEnergybookWorkerTest, AMessageThatSpeaksOfNoneSendsNothing) {
+TEST_F(TWReportingSessionEnergybookWorkerTest, AMessageThatReportsNoneOfThemSendsNothing) {
   EXPECT_FALSE(handle({{"Active_Clients", 2}, {"twreporting_timestamp", 100.0}}));
   EXPECT_THAT(sent(), IsEmpty());
   EXPECT_THAT(errors(), IsEmpty());

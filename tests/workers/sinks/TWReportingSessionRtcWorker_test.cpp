@@ -38,7 +38,7 @@ class TWReportingSessionRtcWorkerTest : public ReportingTest {
   void send(ValueMap payload, AudioEventCategory category = 4, AudioEventType type = 0) {
     session->sendMessage(message(std::move(payload), category, type));
   }
-  // Stops the session and gives the summary that went out.
+  // Stops the session and returns the summary that was sent.
   ValueMap stopAndTakeSummary() {
     session->stop();
     run();
@@ -103,7 +103,7 @@ TEST_F(TWReportingSessionRtcWorkerTest, ThousandsOfSessionsShareOneQueuesThread)
   EXPECT_THAT(test.queues.names(), ElementsAre("com.orvane.tonewerk.session.linkreport"));
 }
 
-TEST_F(TWReportingSessionRtcWorkerTest, TellsTheServiceWhatTheSessionIs) {
+TEST_F(TWReportingSessionRtcWorkerTest, DescribesTheSessionToTheService) {
   startAndRun();
   EXPECT_EQ(service(0).sessionInfo, (ValueMap{{"kLinkReportSessionInfoClientType", 19},
                                               {"kLinkReportSessionInfoClientVersion", 2.1},
@@ -143,7 +143,7 @@ TEST_F(TWReportingSessionRtcWorkerTest, ASingleMessageSessionGoesUnderTheBareSer
   EXPECT_EQ(service(0).userInfo.text("kLinkReportUserInfoServiceName"), "telephony");
 }
 
-TEST_F(TWReportingSessionRtcWorkerTest, AnInternalBuildSaysTheSameOfTheSession) {
+TEST_F(TWReportingSessionRtcWorkerTest, AnInternalBuildDescribesTheSessionInTheSameWay) {
   makeInternalBuild();
   startAndRun();
   EXPECT_EQ(service(0).userInfo.integer("TWReportingSessionID"), 77);
@@ -172,7 +172,7 @@ TEST_F(TWReportingSessionRtcWorkerTest, WithoutATokenTheSessionStaysSilent) {
   EXPECT_THAT(defaults(), ElementsAre("Session never started. handleMessage", "Session never started. stop"));
 }
 
-TEST_F(TWReportingSessionRtcWorkerTest, GoesOnWhenTheBackendsAreKnownAtOnce) {
+TEST_F(TWReportingSessionRtcWorkerTest, ContinuesWhenTheBackendsAreKnownAtOnce) {
   test.linkReport.answerAtOnce({{"one", "two"}});
   startAndRun();
   EXPECT_THAT(texts(), ElementsAre("entering linkreport start", "list of backends (one, two)",
@@ -237,7 +237,7 @@ TEST_F(TWReportingSessionRtcWorkerTest, AfterNineSecondsWithoutBackendsMessagesA
   EXPECT_EQ(test.timers.count(), 0U);
 }
 
-TEST_F(TWReportingSessionRtcWorkerTest, AnAnswerAfterTheTimeOutOpensTheWayForWhatFollows) {
+TEST_F(TWReportingSessionRtcWorkerTest, AfterALateAnswerLaterMessagesAreSent) {
   test.linkReport.answerLater();
   startAndRun();
   test.clock.advance(9.0);
@@ -282,7 +282,7 @@ TEST_F(TWReportingSessionRtcWorkerTest, WithoutBackendsNothingIsSent) {
   EXPECT_THAT(service(0).messages, IsEmpty());
 }
 
-TEST_F(TWReportingSessionRtcWorkerTest, TheBackendsAnswerLeavesTheSessionsFlagAlone) {
+TEST_F(TWReportingSessionRtcWorkerTest, TheBackendsAnswerDoesNotChangeTheSessionsFlag) {
   test.linkReport.answerLater();
   startAndRun();
   session->stop();
@@ -305,7 +305,7 @@ TEST_F(TWReportingSessionRtcWorkerTest, SendsTheBaseCategoryTheTypeAndThePayload
   EXPECT_EQ(Worker::retrieveLinkReportCategoryFromCategory(kCategoryUnknown), 65535);
 }
 
-TEST_F(TWReportingSessionRtcWorkerTest, LeavesTheTimeStampOutAndTheSessionsOwnRecordAlone) {
+TEST_F(TWReportingSessionRtcWorkerTest, LeavesTheTimeStampOutAndDoesNotChangeTheSessionsOwnRecord) {
   startAndRun();
   send({{"a", 1}, {"twreporting_timestamp", ManualClock::kStart}});
   const ValueMap summary = stopAndTakeSummary();
@@ -324,7 +324,7 @@ TEST_F(TWReportingSessionRtcWorkerTest, AnInternalBuildSendsTheTimeStamps) {
   EXPECT_EQ(summary.text("twreporting_timestamp"), "1763633880,1763633881");
 }
 
-TEST_F(TWReportingSessionRtcWorkerTest, WhatHappensToAMessageLaterDoesNotShowInWhatIsSent) {
+TEST_F(TWReportingSessionRtcWorkerTest, LaterChangesOfAMessageAreNotSent) {
   startAndRun();
   const auto sent = message({{"a", 1}});
   session->sendMessage(sent);
@@ -333,7 +333,7 @@ TEST_F(TWReportingSessionRtcWorkerTest, WhatHappensToAMessageLaterDoesNotShowInW
   EXPECT_EQ(service(0).messages[0].payload.integer("a"), 1);
 }
 
-TEST_F(TWReportingSessionRtcWorkerTest, LogsWhyAMessageCouldNotBeSentAndGoesOn) {
+TEST_F(TWReportingSessionRtcWorkerTest, LogsWhyAMessageCouldNotBeSentAndContinues) {
   test.linkReport.failSending("the disk is full");
   startAndRun();
   send({{"a", 1}});
@@ -378,7 +378,7 @@ TEST_F(TWReportingSessionRtcWorkerTest, RedundantMessagesAndThoseBeforeTheStartA
   EXPECT_FALSE(summary.contains("early"));
 }
 
-TEST_F(TWReportingSessionRtcWorkerTest, WhatIsAddressedToOtherWorkersIsInTheSummaryOnly) {
+TEST_F(TWReportingSessionRtcWorkerTest, MessagesForOtherWorkersAreInTheSummaryOnly) {
   static const TWReportingSessionWorkerClass kOther{"Other", false, true, false, false, nullptr};
   startAndRun();
   auto addressed = message({{"a", 1}});
@@ -390,7 +390,7 @@ TEST_F(TWReportingSessionRtcWorkerTest, WhatIsAddressedToOtherWorkersIsInTheSumm
 }
 
 TEST_F(TWReportingSessionRtcWorkerTest, AStopWithoutMessagesSendsNoSummaryButFlushesAndEnds) {
-  // A session always holds its start and stop messages, so the reporter is asked itself.
+  // A session always holds its start and stop messages, so the test calls the reporter directly.
   const auto queue = context->linkReportQueues().makeQueue();
   const auto reporter = std::make_shared<RtcReporter>(queue);
   queue->submit(0, [&] {
@@ -424,7 +424,7 @@ TEST_F(TWReportingSessionRtcWorkerTest, ASecondStartMakesASecondSessionOfTheServ
   EXPECT_EQ(service(1).sessionInfo.text("kLinkReportSessionInfoHierarchyToken"), "root/2");
 }
 
-TEST_F(TWReportingSessionRtcWorkerTest, WhatIsQueuedIsSentAlsoWhenTheSessionIsGone) {
+TEST_F(TWReportingSessionRtcWorkerTest, QueuedMessagesAreSentAlsoWhenTheSessionIsGone) {
   session->start();
   send({{"a", 1}});
   session->stop();
@@ -434,7 +434,7 @@ TEST_F(TWReportingSessionRtcWorkerTest, WhatIsQueuedIsSentAlsoWhenTheSessionIsGo
   EXPECT_FALSE(service(0).isOpen);
 }
 
-TEST_F(TWReportingSessionRtcWorkerTest, WhatIsHeldIsSentAlsoWhenTheSessionIsGone) {
+TEST_F(TWReportingSessionRtcWorkerTest, HeldMessagesAreSentAlsoWhenTheSessionIsGone) {
   test.linkReport.answerLater();
   startAndRun();
   send({{"a", 1}});
@@ -458,7 +458,7 @@ TEST_F(TWReportingSessionRtcWorkerTest, AnAnswerAfterTheWorkersEndIsHarmless) {
   EXPECT_THAT(texts(), Not(Contains(HasSubstr("list of backends"))));
 }
 
-TEST_F(TWReportingSessionRtcWorkerTest, WhatWaitsForBackendsIsBoundedAndTheLossIsSaid) {
+TEST_F(TWReportingSessionRtcWorkerTest, MessagesThatWaitForBackendsAreBoundedAndTheLossIsLogged) {
   test.linkReport.answerLater();
   startAndRun();
   const std::string large(std::size_t{1} << 20, 'x');
@@ -477,7 +477,7 @@ TEST_F(TWReportingSessionRtcWorkerTest, WhatWaitsForBackendsIsBoundedAndTheLossI
   EXPECT_THAT(errors(), IsEmpty());
 }
 
-TEST_F(TWReportingSessionRtcWorkerTest, ASummaryThatFindsNoRoomDoesNotTakeTheEndWithIt) {
+TEST_F(TWReportingSessionRtcWorkerTest, WithoutRoomForTheSummaryTheSessionStillEnds) {
   test.linkReport.answerLater();
   startAndRun();
   const std::string large(std::size_t{1} << 20, 'x');
@@ -490,7 +490,7 @@ TEST_F(TWReportingSessionRtcWorkerTest, ASummaryThatFindsNoRoomDoesNotTakeTheEnd
   EXPECT_EQ(service(0).flushCount, 1U);
 }
 
-TEST_F(TWReportingSessionRtcWorkerTest, TheEndOfTheDaemonSaysWhatStillWaited) {
+TEST_F(TWReportingSessionRtcWorkerTest, TheEndOfTheDaemonLogsHowManyMessagesStillWaited) {
   test.linkReport.answerLater();
   startAndRun();
   send({{"a", 1}});

@@ -93,7 +93,7 @@ TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, WritesAnArrayOfOneMemberObje
     lines.push_back(text.substr(at, text.find('\n', at) - at));
   }
   EXPECT_EQ(lines.front(), "[");
-  EXPECT_EQ(lines[1], "{");  // each object indented over several lines
+  EXPECT_EQ(lines[1], "{");  // each object takes several indented lines
   EXPECT_THAT(lines[2], HasSubstr("\"Setup_Start_1\": {"));
   EXPECT_EQ(std::count(lines.begin(), lines.end(), ","), 2);
   EXPECT_EQ(lines.back(), "]");
@@ -128,12 +128,12 @@ TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, EachPayloadSaysWhetherItsSes
   const auto after = message({{"a", "after"}});
   session->sendMessage(after);
   stop();
-  EXPECT_EQ(before->message.text("isSessionStarted"), "NO");  // the stored messages themselves
+  EXPECT_EQ(before->message.text("isSessionStarted"), "NO");  // in the stored messages themselves
   EXPECT_EQ(after->message.text("isSessionStarted"), "YES");
   EXPECT_THAT(test.files.contents(kPath).value(), HasSubstr("\"isSessionStarted\": \"YES\""));
 }
 
-TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, HoldsWhatTheProducersAdded) {
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, ContainsTheMessagesOfTheProducers) {
   useWorkers({&TWReportingSessionSummaryWorker::kWorkerClass,
               &TWReportingSessionSummaryJsonFileWorker::kWorkerClass});
   session = makeSession(77);
@@ -143,7 +143,7 @@ TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, HoldsWhatTheProducersAdded) 
   EXPECT_THAT(memberNames(), ElementsAre("Setup_Start_1", "Setup_Stop_1", "Session_Generic_Summary_1"));
 }
 
-TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, MakesItsDirectoryForEverybody) {
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, MakesItsDirectoryAccessibleToAllUsers) {
   session->start();
   stop();
   EXPECT_EQ(test.files.directoryMode(kDirectory), 0777U);
@@ -179,7 +179,7 @@ TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, EachStopWritesAFileOfItsOwn)
   EXPECT_THAT(test.files.files(), SizeIs(2));
 }
 
-// The second once took the place of the first.
+// Once, the second file replaced the first.
 TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, StopsWithinOneSecondWriteFilesWithNumbers) {
   for (const char* run : {"first", "second", "third"}) {
     session->start();
@@ -195,7 +195,7 @@ TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, StopsWithinOneSecondWriteFil
               Contains("SummaryJsonFileWorker closed file. action=close file=" + stem + "-3.json"));
 }
 
-// A producer that leaves only redundant messages behind.
+// A producer after which only redundant messages are left.
 class RedundantOnly final : public TWReportingSessionWorkerProducerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
@@ -208,7 +208,8 @@ class RedundantOnly final : public TWReportingSessionWorkerProducerProtocol {
 const TWReportingSessionWorkerClass RedundantOnly::kWorkerClass =
     workerClassOf<RedundantOnly>("RedundantOnly");
 
-TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, WithOnlyRedundantMessagesNoFileIsWrittenButClosed) {
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest,
+       WithOnlyRedundantMessagesNoFileIsWrittenButTheClosingIsLogged) {
   useWorkers({&RedundantOnly::kWorkerClass, &TWReportingSessionSummaryJsonFileWorker::kWorkerClass});
   session = makeSession(77);
   session->setServiceType(11);
@@ -257,7 +258,7 @@ TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, AFileThatCannotBeOpenedIsLog
   EXPECT_THAT(test.files.files(), ElementsAre(kPath));
 }
 
-TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, OfALineOnlyAFailedEndIsReported) {
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, OnlyAFailureAtTheEndOfALineIsLogged) {
   const std::string line =
       "SummaryJsonFileWorker failed to write line. action=writeline file=" + std::string(kPath);
   test.files.failWrite(1, std::errc::no_space_on_device);  // the text of the first line
@@ -265,7 +266,7 @@ TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, OfALineOnlyAFailedEndIsRepor
   stop();
   EXPECT_THAT(test.log.textsOf("twru", LogLevel::kError), Not(Contains(StartsWith(line))));
 
-  test.files.failWrite(2, std::errc::no_space_on_device);  // its end
+  test.files.failWrite(2, std::errc::no_space_on_device);  // the end of the line
   session->start();
   stop();
   EXPECT_THAT(
@@ -273,8 +274,8 @@ TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, OfALineOnlyAFailedEndIsRepor
       Contains(line + " error=\"" + std::make_error_code(std::errc::no_space_on_device).message() + "\""));
 }
 
-// Half a file under the final name was once what a full disk left.
-TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, AFileThatIsNotWholeDoesNotAppearAndItsClosingSaysWhy) {
+// Once, a full disk left half a file under the final name.
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, AnIncompleteFileDoesNotAppearAndItsClosingLogsWhy) {
   for (const int nth : {1, 2, 5}) {
     test.files.failWrite(nth, std::errc::no_space_on_device);
     session->start();
@@ -297,7 +298,7 @@ TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, AFailedCloseIsLogged) {
   EXPECT_EQ(test.files.openFiles(), 0);
 }
 
-TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, APayloadThatJsonCannotSayLeavesAnEmptyEntryAndIsLogged) {
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, APayloadThatIsNotValidJsonLeavesAnEmptyEntryAndIsLogged) {
   session->start();
   send({{"bad", std::nan("")}});
   stop();

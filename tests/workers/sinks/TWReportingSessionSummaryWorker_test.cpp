@@ -24,7 +24,7 @@ class TWReportingSessionSummaryWorkerTest : public ReportingTest {
     session->sendMessage(message(payload, category));
   }
 
-  // Stops the session; its summary as the analytics worker got it.
+  // Stops the session and returns its summary as the analytics worker got it.
   ValueMap summaryAtStop() {
     session->stop();
     const auto summaries = test.metricon.eventsNamed("com.orvane.tonewerk.Session_Generic.Summary");
@@ -36,7 +36,7 @@ class TWReportingSessionSummaryWorkerTest : public ReportingTest {
   std::shared_ptr<TWReportingSession> session = makeSession(77);
 };
 
-TEST_F(TWReportingSessionSummaryWorkerTest, SaysEverythingInItsOrder) {
+TEST_F(TWReportingSessionSummaryWorkerTest, TheSummaryHasAllKeysInOrder) {
   test.system.setThermalLevel(1);
   test.system.setLowPowerMode(true);
   test.system.setLoadAverages({0.5, 1.5, 2.5});
@@ -88,7 +88,7 @@ TEST_F(TWReportingSessionSummaryWorkerTest, AMessageWithDurationAndOverloadCount
   EXPECT_EQ(summary.integer("overload_count"), 0);
 }
 
-TEST_F(TWReportingSessionSummaryWorkerTest, OnlyTheVeryTextIsAnOverload) {
+TEST_F(TWReportingSessionSummaryWorkerTest, OnlyTheExactTextIsAnOverload) {
   session->start();
   send({{"issue_type", "Overload"}});
   send({{"issue_type", 1}});
@@ -104,7 +104,7 @@ TEST_F(TWReportingSessionSummaryWorkerTest, CountsReceivedAndStoredMessages) {
   EXPECT_EQ(*summary.find("num_redundant_messages")->asUnsigned(), 0U);
 }
 
-TEST_F(TWReportingSessionSummaryWorkerTest, TheRedundantCountWrapsWhenMoreIsStoredThanCame) {
+TEST_F(TWReportingSessionSummaryWorkerTest, TheRedundantCountWrapsWhenMoreAreStoredThanReceived) {
   session->start();
   EXPECT_EQ(*summaryAtStop().find("num_redundant_messages")->asUnsigned(),
             std::numeric_limits<std::uint64_t>::max() - 1);
@@ -124,7 +124,7 @@ TEST_F(TWReportingSessionSummaryWorkerTest, DerivedMessagesOfEarlierProducersCou
   EXPECT_EQ(summary.integer("num_unique_messages"), 5);
 }
 
-TEST_F(TWReportingSessionSummaryWorkerTest, TheTotalsGoOnAcrossStops) {
+TEST_F(TWReportingSessionSummaryWorkerTest, TheTotalsContinueAfterAStop) {
   session->start();
   send({{"session_duration", 2.0}});
   EXPECT_EQ(summaryAtStop().integer("active_count"), 1);

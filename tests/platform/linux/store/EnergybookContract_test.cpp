@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What every power log does, run on the one in the report store and on its double in memory.
+// The contract of power logs, tested with the one in the report store and its double in memory.
 #include <gmock/gmock.h>
 #include <string>
 #include <thread>
@@ -99,7 +99,7 @@ TYPED_TEST(EnergybookContract, RecordsEventsInTheirOrder) {
   }
 }
 
-TYPED_TEST(EnergybookContract, RecordsEachEventOfOnePayloadByItself) {
+TYPED_TEST(EnergybookContract, RecordsEventsWithTheSamePayloadSeparately) {
   const ValueMap payload{{"n", 1}};
   this->side_.energybook().sendEvent(1, "a", payload);
   this->side_.energybook().sendEvent(1, "b", payload);
@@ -108,12 +108,12 @@ TYPED_TEST(EnergybookContract, RecordsEachEventOfOnePayloadByItself) {
               ElementsAre(Event{1, "a", payload}, Event{1, "b", payload}, Event{2, "b", payload}));
 }
 
-TYPED_TEST(EnergybookContract, TakesWhatIsEmptyOrNegative) {
+TYPED_TEST(EnergybookContract, AcceptsEmptyNamesAndNegativeGroups) {
   this->side_.energybook().sendEvent(-1, "", {});
   EXPECT_THAT(this->side_.events(), ElementsAre(Event{-1, "", {}}));
 }
 
-TYPED_TEST(EnergybookContract, TakesEventsFromManyThreads) {
+TYPED_TEST(EnergybookContract, AcceptsEventsFromManyThreads) {
   std::vector<std::thread> threads;
   threads.reserve(4);
   for (int thread = 0; thread < 4; ++thread) {

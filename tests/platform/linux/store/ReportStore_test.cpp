@@ -54,7 +54,7 @@ class ReportStoreTest : public testing::Test {
   void record(EventNames names, ValueMap payload) {
     store_->recordEvent(clock_.now(), std::move(names), std::move(payload));
   }
-  // `count` events, each with a payload of its own, numbered from `first`.
+  // Records `count` events, numbered from `first`. Each has a payload of its own.
   void recordNumbered(int count, int first = 0) {
     for (int n = first; n < first + count; ++n) record("com.orvane.n", {{"n", n}});
   }
@@ -201,7 +201,7 @@ TEST_F(ReportStoreTest, WritesWithoutBeingAsked) {
   }
 }
 
-TEST_F(ReportStoreTest, WritesWhatIsLeftWhenItEnds) {
+TEST_F(ReportStoreTest, WritesTheRemainingRowsWhenItEnds) {
   open();
   recordNumbered(3000);
   close();
@@ -246,7 +246,7 @@ TEST_F(ReportStoreTest, TakesEventsFromManyThreads) {
   EXPECT_THAT(errors(), IsEmpty());
 }
 
-TEST_F(ReportStoreTest, IsReadWhileItWrites) {
+TEST_F(ReportStoreTest, CanBeReadWhileItWrites) {
   open();
   recordNumbered(1);
   ASSERT_TRUE(flush());
@@ -266,11 +266,11 @@ TEST_F(ReportStoreTest, IsReadWhileItWrites) {
   EXPECT_EQ(number("SELECT count(*) FROM analytics_event"), 5001);
 }
 
-// A file stands where the directory should be: also root cannot write there.
+// A file is at the path of the directory, so that root cannot write there either.
 class BrokenReportStoreTest : public ReportStoreTest {
  protected:
-  BrokenReportStoreTest() { breakDirectory(); }
-  void breakDirectory() { std::ofstream(directory_) << "in the way"; }
+  BrokenReportStoreTest() { blockDirectory(); }
+  void blockDirectory() { std::ofstream(directory_) << "in the way"; }
   void repairDirectory() { std::filesystem::remove(directory_); }
 
   ReportStore::Limits small() {
@@ -281,7 +281,7 @@ class BrokenReportStoreTest : public ReportStoreTest {
   }
 };
 
-TEST_F(BrokenReportStoreTest, SaysOnceThatItCannotWrite) {
+TEST_F(BrokenReportStoreTest, LogsOnceThatItCannotWrite) {
   open();
   recordNumbered(1);
   EXPECT_FALSE(flush());
@@ -290,7 +290,7 @@ TEST_F(BrokenReportStoreTest, SaysOnceThatItCannotWrite) {
   EXPECT_THAT(errors(), ElementsAre(AllOf(HasSubstr("cannot write"), HasSubstr(file()))));
 }
 
-TEST_F(BrokenReportStoreTest, WritesWhatItKeptWhenTheDiskIsBack) {
+TEST_F(BrokenReportStoreTest, WritesTheKeptRowsWhenTheDiskWorksAgain) {
   open();
   recordNumbered(3);
   EXPECT_FALSE(flush());
@@ -300,9 +300,9 @@ TEST_F(BrokenReportStoreTest, WritesWhatItKeptWhenTheDiskIsBack) {
   EXPECT_THAT(errors(), ElementsAre(HasSubstr("cannot write"), HasSubstr("rows dropped meanwhile: 0")));
 }
 
-TEST_F(BrokenReportStoreTest, NeverHoldsWhoRecordsAndCountsWhatItDrops) {
+TEST_F(BrokenReportStoreTest, NeverMakesRecordingWaitAndCountsTheRowsItDrops) {
   open(small());
-  recordNumbered(10);  // returns, though only four fit and nothing is ever written
+  recordNumbered(10);  // returns, although only four fit and nothing is written
   EXPECT_FALSE(flush());
   repairDirectory();
   EXPECT_TRUE(flush());
@@ -310,7 +310,7 @@ TEST_F(BrokenReportStoreTest, NeverHoldsWhoRecordsAndCountsWhatItDrops) {
   EXPECT_THAT(errors(), ElementsAre(HasSubstr("cannot write"), HasSubstr("rows dropped meanwhile: 6")));
 }
 
-TEST_F(BrokenReportStoreTest, CountsAtTheEndWhatIsLost) {
+TEST_F(BrokenReportStoreTest, CountsTheLostRowsAtTheEnd) {
   open(small());
   recordNumbered(10);
   close();
@@ -318,7 +318,7 @@ TEST_F(BrokenReportStoreTest, CountsAtTheEndWhatIsLost) {
                                     HasSubstr("could not be written to " + file() + ": 10")));
 }
 
-TEST_F(BrokenReportStoreTest, SaysAnewWhenItBreaksAgain) {
+TEST_F(BrokenReportStoreTest, LogsAgainWhenItBreaksAgain) {
   open();
   recordNumbered(1);
   EXPECT_FALSE(flush());
@@ -326,14 +326,14 @@ TEST_F(BrokenReportStoreTest, SaysAnewWhenItBreaksAgain) {
   recordNumbered(1);
   EXPECT_TRUE(flush());
   std::filesystem::remove_all(directory_);
-  breakDirectory();
+  blockDirectory();
   recordNumbered(1);
   EXPECT_FALSE(flush());
   EXPECT_THAT(errors(),
               ElementsAre(HasSubstr("cannot write"), HasSubstr("goes on"), HasSubstr("cannot write")));
 }
 
-TEST_F(ReportStoreTest, MakesANewFileWhenSomebodyTookItAway) {
+TEST_F(ReportStoreTest, MakesANewFileWhenTheFileWasRemoved) {
   open();
   recordNumbered(1);
   ASSERT_TRUE(flush());
@@ -343,7 +343,7 @@ TEST_F(ReportStoreTest, MakesANewFileWhenSomebodyTookItAway) {
   EXPECT_THAT(payloads(), ElementsAre(R"({"n":1})"));
 }
 
-// The limit on a file's size stands for a full disk; it holds for root too.
+// The limit on a file's size simulates a full disk. It also applies to root.
 class FullDisk {
  public:
   explicit FullDisk(rlim_t bytes) {
@@ -360,7 +360,7 @@ class FullDisk {
   rlimit before_{};
 };
 
-TEST_F(ReportStoreTest, GoesOnWhereItWasWhenAFullDiskHasRoomAgain) {
+TEST_F(ReportStoreTest, ContinuesWhereItWasWhenAFullDiskHasRoomAgain) {
   open();
   recordNumbered(1);
   ASSERT_TRUE(flush());
@@ -376,7 +376,7 @@ TEST_F(ReportStoreTest, GoesOnWhereItWasWhenAFullDiskHasRoomAgain) {
   EXPECT_FALSE(std::filesystem::exists(file() + ".corrupt"));
 }
 
-TEST_F(ReportStoreTest, WaitsOutAnotherWriter) {
+TEST_F(ReportStoreTest, WaitsForAnotherWriter) {
   open();
   ASSERT_TRUE(flush());
   recordNumbered(1);
@@ -402,7 +402,7 @@ TEST_F(ReportStoreTest, MovesAFileThatIsNoDatabaseAside) {
   EXPECT_THAT(errors(), ElementsAre(HasSubstr("damaged")));
 }
 
-TEST_F(ReportStoreTest, MovesADamagedDatabaseAsideAndKeepsWhatWasToBeWritten) {
+TEST_F(ReportStoreTest, MovesADamagedDatabaseAsideAndKeepsTheRowsToBeWritten) {
   open();
   recordNumbered(2000);
   ASSERT_TRUE(flush());
@@ -421,7 +421,7 @@ TEST_F(ReportStoreTest, MovesADamagedDatabaseAsideAndKeepsWhatWasToBeWritten) {
   EXPECT_THAT(errors(), ElementsAre(HasSubstr("damaged")));
 }
 
-TEST_F(ReportStoreTest, LeavesAFileOfANewerVersionAlone) {
+TEST_F(ReportStoreTest, DoesNotChangeAFileOfANewerVersion) {
   open();
   recordNumbered(1);
   ASSERT_TRUE(flush());
@@ -441,7 +441,7 @@ TEST_F(ReportStoreTest, LeavesAFileOfANewerVersionAlone) {
               ElementsAre(HasSubstr("newer version (schema 2)"), HasSubstr("could not be written")));
 }
 
-TEST_F(ReportStoreTest, DeletesWhatIsOlderThanTheBound) {
+TEST_F(ReportStoreTest, DeletesRowsThatAreOlderThanTheBound) {
   open();
   recordNumbered(700);
   clock_.advance(20 * kDay);
@@ -466,7 +466,7 @@ TEST_F(ReportStoreTest, TakesTheDaysFromThePreferences) {
   EXPECT_THAT(payloads(), ElementsAre(R"({"n":5})"));
 }
 
-TEST_F(ReportStoreTest, NeverGivesOutAnIdentifierAgain) {
+TEST_F(ReportStoreTest, NeverUsesAnIdentifierAgain) {
   open();
   recordNumbered(3);
   ASSERT_TRUE(flush());
@@ -519,7 +519,7 @@ TEST_F(ReportStoreTest, ShrinksTheFileWhenTheBoundIsLowered) {
   EXPECT_GT(events().size(), 300U);
 }
 
-TEST_F(ReportStoreTest, DeletesTheOldestRowsOfWhateverTable) {
+TEST_F(ReportStoreTest, DeletesTheOldestRowsOfEveryTable) {
   open();
   ASSERT_TRUE(flush());
   recordNumbered(1);
@@ -586,10 +586,10 @@ TEST_F(ReportStoreTest, DeletesTheOldestPowerEventsToKeepTheFileWithinItsBound) 
   ASSERT_TRUE(flush());
   const std::int64_t oldest = number("SELECT min(payload ->> 'n') FROM power_event");
   EXPECT_EQ(number("SELECT max(payload ->> 'n') FROM power_event"), 5998);
-  EXPECT_EQ(number("SELECT count(*) FROM power_event"), (6000 - oldest) / 2);  // none between is missing
+  EXPECT_EQ(number("SELECT count(*) FROM power_event"), (6000 - oldest) / 2);  // no row between is missing
   EXPECT_GT(oldest, 4000);
   EXPECT_LT(oldest, 5200);
-  // Both tables reach back to about the same time.
+  // The oldest rows of both tables are about equally old.
   EXPECT_NEAR(static_cast<double>(number("SELECT min(payload ->> 'n') FROM analytics_event")),
               static_cast<double>(oldest), 1100.0);
   close();
@@ -603,7 +603,7 @@ class BoundedReportStoreTest : public ReportStoreTest {
     bounds_.bytes = std::int64_t{megabytes} << 20;
     open();
   }
-  // A row of that many bytes, now in one table, now in another.
+  // Records a row of that many bytes, in one table or in another.
   void recordRow(int n, std::size_t bytes) {
     clock_.advance(0.01);
     const std::string text(bytes, 'x');
@@ -613,12 +613,12 @@ class BoundedReportStoreTest : public ReportStoreTest {
       record("com.orvane.n", {{"n", n}, {"text", text}});
     }
   }
-  // How much of the database file's part of the bound is in use.
+  // The part of the database file's bound that is in use.
   double usedPart() {
     const std::int64_t pages = number("PRAGMA page_count") - number("PRAGMA freelist_count");
     return static_cast<double>(pages * number("PRAGMA page_size")) / static_cast<double>(bounds_.fileBytes());
   }
-  // The numbers of all rows that are left, of both tables.
+  // The numbers of all rows that are left in both tables.
   std::vector<std::int64_t> numbersLeft() {
     std::vector<std::int64_t> numbers;
     SqliteDatabase database;
@@ -629,7 +629,7 @@ class BoundedReportStoreTest : public ReportStoreTest {
     while (select.step() == SqliteStatement::Step::kRow) numbers.push_back(select.integer(0));
     return numbers;
   }
-  // Nothing is missing between the oldest row and the last of `count`.
+  // Expects that no row is missing between the oldest one and the last of `count`.
   void expectTheNewestOf(int count) {
     const std::vector<std::int64_t> numbers = numbersLeft();
     ASSERT_FALSE(numbers.empty());
@@ -640,7 +640,7 @@ class BoundedReportStoreTest : public ReportStoreTest {
   StoreBounds bounds_;
 };
 
-// 500 rows at once were deleted of each table, which with the smallest bound was all but the newest.
+// Once, 500 rows were deleted from each table at a time. With the smallest bound that was all but the newest.
 TEST_F(BoundedReportStoreTest, KeepsAsManyRowsOfAKilobyteAsTheSmallestBoundHasRoomFor) {
   openBoundedTo(1);
   for (int n = 0; n < 3000; ++n) {
@@ -664,8 +664,9 @@ TEST_F(BoundedReportStoreTest, DeletesByBytesWhereRowsOfAHundredLieBetweenRowsOf
   expectTheNewestOf(6000);
 }
 
-// A summary of a whole session may be larger than a small bound, and is the newest row of its table for long.
-TEST_F(BoundedReportStoreTest, ANewestRowThatTheBoundHasNoRoomForIsEmptiedAndCostsNoOthers) {
+// A summary of a whole session may be larger than a small bound, and may stay the newest row of its table for
+// long.
+TEST_F(BoundedReportStoreTest, ANewestRowThatDoesNotFitTheBoundIsEmptiedAndNoOthersAreDeleted) {
   openBoundedTo(1);
   for (int n = 0; n < 400; ++n) record("com.orvane.n", {{"n", n}, {"text", std::string(1000, 'x')}});
   recordPower(1000, std::string(3'000'000, 'x'));
@@ -677,7 +678,7 @@ TEST_F(BoundedReportStoreTest, ANewestRowThatTheBoundHasNoRoomForIsEmptiedAndCos
   EXPECT_EQ(number("SELECT count(*) FROM power_event WHERE payload = '{}'"), 1);
 }
 
-TEST_F(BoundedReportStoreTest, KeepsToANewBoundAtOnceWhenItIsToldToReadItAgain) {
+TEST_F(BoundedReportStoreTest, AppliesANewBoundAtOnceWhenItReadsTheBoundsAgain) {
   openBoundedTo(8);
   for (int n = 0; n < 3000; ++n) recordRow(n, 1000);
   ASSERT_TRUE(flush());
@@ -685,21 +686,21 @@ TEST_F(BoundedReportStoreTest, KeepsToANewBoundAtOnceWhenItIsToldToReadItAgain) 
   bounds_.bytes = 1 << 20;
   recordRow(3000, 1000);
   ASSERT_TRUE(flush());
-  EXPECT_GT(usedPart(), 3.0);  // the clock has not come to the next look
+  EXPECT_GT(usedPart(), 3.0);  // it is not yet time to read the bound again
 
   store_->readBoundsAgain();
   recordRow(3001, 1000);
   ASSERT_TRUE(flush());
-  close();  // with what trimming was begun
+  close();  // finishes the trimming that was begun
   EXPECT_LE(usedPart(), 1.0);
   expectTheNewestOf(3002);
 }
 
-TEST_F(BoundedReportStoreTest, WhatStaysIsBetweenNineTenthsOfTheBoundAndAllOfItWhateverTheRows) {
+TEST_F(BoundedReportStoreTest, WithAnyRowsBetweenNineTenthsOfTheBoundAndAllOfItIsInUse) {
   for (unsigned seed = 1; seed <= 8; ++seed) {
     SCOPED_TRACE(seed);
     std::mt19937 random(seed);
-    // Small rows mostly, now and then one of up to a 30th of the bound; just over a page is the worst fit.
+    // Most rows are small. Some have up to a 30th of the bound. The worst fit is a row of just over a page.
     std::uniform_real_distribution<double> logarithm(2.0, std::log(50'000.0));
     openBoundedTo(2);
     std::size_t written = 0;
@@ -718,7 +719,7 @@ TEST_F(BoundedReportStoreTest, WhatStaysIsBetweenNineTenthsOfTheBoundAndAllOfItW
   }
 }
 
-TEST_F(ReportStoreTest, LeavesOutBoundsThatAreNoNumberFromOne) {
+TEST_F(ReportStoreTest, IgnoresBoundsThatAreNoNumberFromOne) {
   preferences_.configure("com.orvane.tonewerk.store", "max_megabytes", "much");
   preferences_.configure("com.orvane.tonewerk.store", "max_days", 0);
   open();

@@ -30,7 +30,7 @@ class RtcTableTest : public testing::Test {
     return {0.5, session, 4, 65535, {{"n", number}}};
   }
 
-  // The columns of each row, joined.
+  // The columns of each row, joined by spaces.
   std::vector<std::string> rows(const std::string& sql, int columns) {
     SqliteDatabase database;
     EXPECT_TRUE(database.open(directory_.path("reports.db"), SqliteDatabase::Mode::kReadOnly,
@@ -68,7 +68,7 @@ TEST_F(RtcTableTest, AMessageNamesItsSession) {
   EXPECT_THAT(rows("SELECT sent_at, category, type FROM rtc_message LIMIT 1", 3), ElementsAre("0.5 4 65535"));
 }
 
-TEST_F(RtcTableTest, AMessageWhoseSessionsRowWasDroppedBringsItAlong) {
+TEST_F(RtcTableTest, AMessageWritesTheDroppedRowOfItsSession) {
   const auto session = makeSession(1);
   EXPECT_EQ(write({messageOf(session, 1)}), Result::kDone);
   EXPECT_EQ(write({messageOf(session, 2)}), Result::kDone);
@@ -88,25 +88,25 @@ TEST_F(RtcTableTest, ANewFileGetsTheSessionAgain) {
   EXPECT_THAT(messages(), ElementsAre(R"(1 {"n":2})"));
 }
 
-TEST_F(RtcTableTest, AnUndoneTransactionIsForgotten) {
+TEST_F(RtcTableTest, AnUndoneTransactionHasNoEffect) {
   const auto kept = makeSession(1);
   const auto undone = makeSession(2);
   ASSERT_EQ(write({RtcSessionRow{kept}}), Result::kDone);
   {
-    SqliteDatabase meddler;
-    ASSERT_TRUE(meddler.open(directory_.path("reports.db"), SqliteDatabase::Mode::kReadWrite,
-                             std::chrono::seconds(30)));
+    SqliteDatabase otherWriter;
+    ASSERT_TRUE(otherWriter.open(directory_.path("reports.db"), SqliteDatabase::Mode::kReadWrite,
+                                 std::chrono::seconds(30)));
     ASSERT_TRUE(
-        meddler.run("CREATE TRIGGER refuse BEFORE INSERT ON rtc_message"
-                    " BEGIN SELECT RAISE(ABORT, 'no'); END"));
+        otherWriter.run("CREATE TRIGGER refuse BEFORE INSERT ON rtc_message"
+                        " BEGIN SELECT RAISE(ABORT, 'no'); END"));
   }
   EXPECT_EQ(write({RtcSessionRow{undone}, messageOf(undone, 1)}), Result::kFailed);
   EXPECT_EQ(undone->place.file, 0U);
   {
-    SqliteDatabase meddler;
-    ASSERT_TRUE(meddler.open(directory_.path("reports.db"), SqliteDatabase::Mode::kReadWrite,
-                             std::chrono::seconds(30)));
-    ASSERT_TRUE(meddler.run("DROP TRIGGER refuse"));
+    SqliteDatabase otherWriter;
+    ASSERT_TRUE(otherWriter.open(directory_.path("reports.db"), SqliteDatabase::Mode::kReadWrite,
+                                 std::chrono::seconds(30)));
+    ASSERT_TRUE(otherWriter.run("DROP TRIGGER refuse"));
   }
   EXPECT_EQ(write({RtcSessionRow{undone}, messageOf(undone, 1), messageOf(kept, 2)}), Result::kDone);
   EXPECT_THAT(rows("SELECT started_at FROM rtc_session ORDER BY id", 1), ElementsAre("1.0", "2.0"));

@@ -61,13 +61,13 @@ class StoreMetriconTest : public testing::Test {
   StoreMetricon metricon_{store_, preferences_, clock_, category_};
 };
 
-TEST_F(StoreMetriconTest, TakesOurEventsWithoutAnyPreference) {
+TEST_F(StoreMetriconTest, UsesComOrvaneEventsWithoutAPreference) {
   EXPECT_TRUE(isUsed("com.orvane.tonewerk.HAL_Playback.Stop"));
   EXPECT_FALSE(isUsed("org.example.Playback.Stop"));
   EXPECT_FALSE(isUsed("com.orvane"));
 }
 
-TEST_F(StoreMetriconTest, AsksForWhatTheConsumersAskFor) {
+TEST_F(StoreMetriconTest, UsesTheEventsThatConsumersAskFor) {
   configureConsumers(ValueArray{consumer("calls", {"com.orvane.telephony.*", "*.Error"}),
                                 consumer("plots", {"com.orvane.?.[AB]"})});
   EXPECT_TRUE(isUsed("com.orvane.telephony.Volume.Summary"));
@@ -78,7 +78,7 @@ TEST_F(StoreMetriconTest, AsksForWhatTheConsumersAskFor) {
   EXPECT_THAT(errors(), IsEmpty());
 }
 
-TEST_F(StoreMetriconTest, NobodyAsksWhenThereAreNoConsumers) {
+TEST_F(StoreMetriconTest, UsesNoEventWithoutConsumers) {
   configureConsumers(ValueArray{});
   EXPECT_FALSE(isUsed("com.orvane.tonewerk.IO.Stop"));
 }
@@ -92,14 +92,14 @@ TEST_F(StoreMetriconTest, SeesAChangeWithinASecond) {
   EXPECT_FALSE(isUsed("com.orvane.tonewerk.IO.Stop"));
 }
 
-TEST_F(StoreMetriconTest, SeesAChangeAtOnceWhenItIsToldToReadAgain) {
+TEST_F(StoreMetriconTest, SeesAChangeAtOnceWhenItReadsAgain) {
   EXPECT_FALSE(isUsed("org.example.x"));
   preferences_.configure("com.orvane.metricon", "consumers", ValueArray{consumer("c", {"org.*"})});
   metricon_.readConsumersAgain();
   EXPECT_TRUE(isUsed("org.example.x"));
 }
 
-TEST_F(StoreMetriconTest, SaysOnceWhatItCannotRead) {
+TEST_F(StoreMetriconTest, LogsOnceWhatItCannotRead) {
   configureConsumers(ValueArray{5, consumer("good", {"org.*", 7}), ValueMap{{"name", "empty"}},
                                 ValueMap{{"events", ValueArray{"net.*"}}}});
   EXPECT_TRUE(isUsed("org.example.x"));
@@ -112,26 +112,26 @@ TEST_F(StoreMetriconTest, SaysOnceWhatItCannotRead) {
                                     HasSubstr("entry 4 has no name")));
 }
 
-TEST_F(StoreMetriconTest, SaysWhenTheConsumersAreNoArray) {
+TEST_F(StoreMetriconTest, LogsWhenTheConsumersAreNoArray) {
   configureConsumers("everybody");
   EXPECT_FALSE(isUsed("com.orvane.tonewerk.IO.Stop"));
   EXPECT_THAT(errors(), ElementsAre(HasSubstr("no array of tables: everybody")));
 }
 
 TEST_F(StoreMetriconTest, StillAnswersAfterMoreNamesThanItRemembers) {
-  for (int n = 0; n < 3000; ++n) {  // two names each; it remembers 4,096
+  for (int n = 0; n < 3000; ++n) {  // 6,000 names; it remembers 4,096
     EXPECT_TRUE(isUsed("com.orvane." + std::to_string(n)));
     EXPECT_FALSE(isUsed("org." + std::to_string(n)));
   }
 }
 
-TEST_F(StoreMetriconTest, RecordsAnEventOnceHoweverManyAskForIt) {
+TEST_F(StoreMetriconTest, RecordsAnEventOnceWhenSeveralConsumersAskForIt) {
   configureConsumers(ValueArray{consumer("a", {"com.orvane.*"}), consumer("b", {"com.orvane.x"})});
   metricon_.sendEvent("com.orvane.x", [] { return ValueMap{{"n", 1}}; });
   EXPECT_EQ(recorded("com.orvane.x"), 1);
 }
 
-TEST_F(StoreMetriconTest, NeitherRecordsNorMakesAPayloadNobodyAsksFor) {
+TEST_F(StoreMetriconTest, NeitherMakesNorRecordsAPayloadThatNoConsumerAsksFor) {
   bool asked = false;
   metricon_.sendEvent("org.example.x", [&] {
     asked = true;
@@ -152,7 +152,7 @@ TEST_F(StoreMetriconTest, RecordsTwoNamesOfAnEventWithOnePayload) {
   EXPECT_EQ(number("SELECT count(*) FROM analytics_row"), 1);
 }
 
-TEST_F(StoreMetriconTest, RecordsOnlyTheNameThatSomebodyAsksFor) {
+TEST_F(StoreMetriconTest, RecordsOnlyTheNameThatAConsumerAsksFor) {
   metricon_.sendEvent({"org.example.x", "com.orvane.x"}, [] { return ValueMap{{"n", 1}}; });
   metricon_.sendEvent({"com.orvane.y", "org.example.y"}, [] { return ValueMap{{"n", 2}}; });
   EXPECT_EQ(recorded("org.example.x"), 0);

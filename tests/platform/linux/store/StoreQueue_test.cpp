@@ -30,7 +30,7 @@ class StoreQueueTest : public testing::Test {
   std::vector<StoreRow> batch_;
 };
 
-TEST_F(StoreQueueTest, MakesWhoAddsWaitUntilThereIsRoom) {
+TEST_F(StoreQueueTest, AddWaitsUntilThereIsRoom) {
   EXPECT_FALSE(queue_.add(row(0)));
   EXPECT_FALSE(queue_.add(row(1)));
   auto third = std::async(std::launch::async, [&] { return queue_.add(row(2)); });
@@ -58,7 +58,7 @@ TEST_F(StoreQueueTest, CountsRowsUntilTheyAreCommitted) {
   EXPECT_THAT(batch_, SizeIs(1));
 }
 
-TEST_F(StoreQueueTest, LetsWhoWaitsGoWhenWritingFails) {
+TEST_F(StoreQueueTest, AddStopsWaitingWhenWritingFails) {
   EXPECT_FALSE(queue_.add(row(0)));
   EXPECT_FALSE(queue_.add(row(1)));
   auto third = std::async(std::launch::async, [&] { return queue_.add(row(2)); });
@@ -69,7 +69,7 @@ TEST_F(StoreQueueTest, LetsWhoWaitsGoWhenWritingFails) {
   queue_.committed();
 }
 
-TEST_F(StoreQueueTest, TakesARowLargerThanAllItsRoomAlone) {
+TEST_F(StoreQueueTest, TakesARowThatIsLargerThanItsBoundAlone) {
   StoreQueue::Limits limits = small();
   limits.bytes = 10;
   StoreQueue queue(limits);
@@ -78,7 +78,7 @@ TEST_F(StoreQueueTest, TakesARowLargerThanAllItsRoomAlone) {
   EXPECT_THAT(batch_, SizeIs(1));
 }
 
-TEST_F(StoreQueueTest, HoldsNobodyLongerThanTheHoldTimeAndSaysSoOnce) {
+TEST_F(StoreQueueTest, AddWaitsNoLongerThanTheHoldTimeAndReportsThatOnce) {
   StoreQueue::Limits limits = small();
   limits.hold = milliseconds(1);
   StoreQueue queue(limits);
@@ -106,7 +106,7 @@ TEST_F(StoreQueueTest, FlushIsTriedOnceMoreBeforeItFails) {
   queue_.attempt();
   queue_.failed();
   auto flushed = std::async(std::launch::async, [&] { return queue_.flush(kLongEnough); });
-  EXPECT_TRUE(queue_.pause(kLongEnough));  // ended by the flush
+  EXPECT_TRUE(queue_.pause(kLongEnough));  // the flush ended it
   queue_.attempt();
   queue_.failed();
   EXPECT_FALSE(flushed.get());
@@ -117,9 +117,9 @@ TEST_F(StoreQueueTest, FlushGivesUpAfterItsTime) {
   EXPECT_FALSE(queue_.flush(milliseconds(1)));
 }
 
-TEST_F(StoreQueueTest, FlushOfNothingIsDone) { EXPECT_TRUE(queue_.flush(kLongEnough)); }
+TEST_F(StoreQueueTest, FlushOfAnEmptyQueueSucceeds) { EXPECT_TRUE(queue_.flush(kLongEnough)); }
 
-TEST_F(StoreQueueTest, GivesWhatIsLeftBeforeItStops) {
+TEST_F(StoreQueueTest, ReturnsTheRemainingRowsBeforeItStops) {
   EXPECT_FALSE(queue_.add(row(0)));
   queue_.stop();
   EXPECT_TRUE(queue_.take(batch_, true));
@@ -130,7 +130,7 @@ TEST_F(StoreQueueTest, GivesWhatIsLeftBeforeItStops) {
   EXPECT_FALSE(queue_.pause(kLongEnough));
 }
 
-TEST_F(StoreQueueTest, ANudgedWriterComesBackWithoutRows) {
+TEST_F(StoreQueueTest, ANudgedWriterReturnsWithoutRows) {
   queue_.nudge();
   ASSERT_TRUE(queue_.take(batch_, true));
   EXPECT_THAT(batch_, IsEmpty());

@@ -29,7 +29,7 @@ class StoreReaderTest : public testing::Test {
   void openStore() {
     store_ = std::make_unique<ReportStore>(directory_.path(), json_, preferences_, clock_, category_);
   }
-  // Ten seconds after the one before.
+  // Records an event ten seconds after the one before.
   void record(const std::string& name) {
     clock_.advance(10.0);
     store_->recordEvent(clock_.now(), name, {{"n", ++recorded_}});
@@ -57,12 +57,12 @@ class StoreReaderTest : public testing::Test {
   std::int64_t lastId_ = 0;
 };
 
-TEST_F(StoreReaderTest, SaysThatThereIsNoStore) {
+TEST_F(StoreReaderTest, ReportsThatThereIsNoStore) {
   EXPECT_EQ(open(), StoreReader::Outcome::kNoStore);
   EXPECT_THAT(reader_.problem(), HasSubstr("no such file"));
 }
 
-TEST_F(StoreReaderTest, SaysThatAnEmptyFileHoldsNothingYet) {
+TEST_F(StoreReaderTest, ReportsThatAnEmptyFileHoldsNothingYet) {
   { const std::ofstream empty(directory_.path("reports.db")); }
   EXPECT_EQ(open(), StoreReader::Outcome::kNoStore);
 }
@@ -91,8 +91,8 @@ TEST_F(StoreReaderTest, ReadsWithoutAWriterAndItsSideFiles) {
   EXPECT_THAT(payloads(), ElementsAre(R"({"n":1})"));
 }
 
-// SQLite keeps as text whatever it is given; a store may be older than the rule that nothing else comes in.
-TEST_F(StoreReaderTest, GivesTextWhateverBytesTheFileHolds) {
+// SQLite stores any bytes as text, and a store may be older than the rule that only valid text is stored.
+TEST_F(StoreReaderTest, ReturnsValidTextForAnyBytesInTheFile) {
   openStore();
   store_->recordEvent(clock_.now(), "x.a", {{"processName", "lecteur-musiqu\xC3"}});
   ASSERT_TRUE(store_->flush(std::chrono::seconds(30)));
@@ -100,7 +100,7 @@ TEST_F(StoreReaderTest, GivesTextWhateverBytesTheFileHolds) {
   EXPECT_THAT(payloads(), ElementsAre("{\"processName\":\"lecteur-musiqu\uFFFD\"}"));
 }
 
-TEST_F(StoreReaderTest, LetsThroughWhatTheFilterSays) {
+TEST_F(StoreReaderTest, ReadsTheEventsThatPassTheFilter) {
   openStore();
   for (const char* name : {"x.a", "x.b", "y.a", "y.b"}) record(name);
   ASSERT_EQ(open(), StoreReader::Outcome::kDone);
@@ -117,7 +117,7 @@ TEST_F(StoreReaderTest, LetsThroughWhatTheFilterSays) {
   EXPECT_THAT(payloads(newest), ElementsAre(R"({"n":3})"));
 }
 
-TEST_F(StoreReaderTest, GoesOnBehindTheLastEvent) {
+TEST_F(StoreReaderTest, ContinuesAfterTheLastEvent) {
   openStore();
   record("a");
   ASSERT_EQ(open(), StoreReader::Outcome::kDone);
@@ -145,11 +145,11 @@ TEST_F(StoreReaderTest, SplitsTheTwoNamesOfARowBetweenTwoReads) {
   EXPECT_THAT(names, ElementsAre("second"));
 }
 
-TEST_F(StoreReaderTest, SumsDurationsOfWhateverKind) {
+TEST_F(StoreReaderTest, SumsDurationsOfEveryKind) {
   openStore();
   record("a");
   for (const Value& duration : {Value(2), Value(0.5), Value("1.5 s"), Value(true), Value(ValueArray{9}),
-                                Value(std::nan(""))}) {  // the last is stored as null and counts as none
+                                Value(std::nan(""))}) {  // the last is stored as null, so it is not counted
     store_->record(PowerRow{clock_.now(), 28, "x", {{"EngineOnDuration", duration}, {"ApplicationName", 7}}});
   }
   store_->record(PowerRow{clock_.now(), 28, "x", {{"ApplicationName", "nobody"}}});
@@ -164,7 +164,7 @@ TEST_F(StoreReaderTest, SumsDurationsOfWhateverKind) {
   EXPECT_EQ(totals[0].events, 5);
 }
 
-TEST_F(StoreReaderTest, NoticesThatTheFileHasGone) {
+TEST_F(StoreReaderTest, NoticesThatTheFileWasMoved) {
   openStore();
   record("a");
   ASSERT_EQ(open(), StoreReader::Outcome::kDone);
