@@ -15,7 +15,7 @@ struct EventNames {
   EventNames() = default;
   // Implicit, because most events have one name.
   template <std::convertible_to<SharedString> Name>
-  EventNames(Name&& name) : first(std::forward<Name>(name)) {}
+  EventNames(const Name& name) : first(name) {}
   EventNames(SharedString firstName, SharedString secondName)
       : first(std::move(firstName)), second(std::move(secondName)) {}
 

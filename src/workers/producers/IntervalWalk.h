@@ -65,7 +65,7 @@ class IntervalWalk {
  protected:
   // The latest value of every key, before the message that is being looked at.
   const ValueMap& state() const { return state_; }
-  // The latest value of one key, which must be among the defaults.
+  // The latest value of one key, which the state must have.
   Value current(std::string_view key) const { return *state_.find(key); }
   // Whether the state and the message both have the key, with different texts.
   bool changesText(const ValueMap& message, std::string_view key) const;
