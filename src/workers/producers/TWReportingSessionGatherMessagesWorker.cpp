@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "workers/producers/TWReportingSessionGatherMessagesWorker.h"
 
+#include <cassert>
 #include <optional>
 #include <string_view>
 
@@ -72,6 +73,7 @@ const TWReportingSessionWorkerClass TWReportingSessionGatherMessagesWorker::kWor
     workerClassOf<TWReportingSessionGatherMessagesWorker>("TWReportingSessionGatherMessagesWorker");
 
 void TWReportingSessionGatherMessagesWorker::stop() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto owner = session.lock();
   if (owner == nullptr || owner->messages().empty()) return;
   const TWReportingSessionMessages summaries = createGatherMessages(

@@ -2,6 +2,7 @@
 #include "workers/producers/TWReportingSessionInputMessagesWorker.h"
 
 #include <array>
+#include <cassert>
 #include <optional>
 #include <set>
 #include <string>
@@ -98,6 +99,7 @@ const TWReportingSessionWorkerClass TWReportingSessionInputMessagesWorker::kWork
     workerClassOf<TWReportingSessionInputMessagesWorker>("TWReportingSessionInputMessagesWorker");
 
 void TWReportingSessionInputMessagesWorker::stop() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto owner = session.lock();
   if (owner == nullptr || owner->messages().empty()) return;
   const SharedString application = TWReportingUtilityRetrieveAppName(owner->configuration());

@@ -2,6 +2,7 @@
 #include "workers/producers/TWReportingSessionVolumeMessagesWorker.h"
 
 #include <array>
+#include <cassert>
 #include <optional>
 #include <string_view>
 
@@ -88,6 +89,7 @@ const TWReportingSessionWorkerClass TWReportingSessionVolumeMessagesWorker::kWor
     workerClassOf<TWReportingSessionVolumeMessagesWorker>("TWReportingSessionVolumeMessagesWorker");
 
 void TWReportingSessionVolumeMessagesWorker::stop() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto owner = session.lock();
   if (owner == nullptr || owner->messages().empty()) return;
   const SharedString application = TWReportingUtilityRetrieveAppName(owner->configuration());

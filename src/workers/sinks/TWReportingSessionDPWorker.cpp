@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "workers/sinks/TWReportingSessionDPWorker.h"
 
+#include <cassert>
 #include <optional>
 
 #include "platform/Clock.h"
@@ -70,6 +71,7 @@ const TWReportingSessionWorkerClass TWReportingSessionDPWorker::kWorkerClass =
 
 std::shared_ptr<TWReportingSessionDPWorker> TWReportingSessionDPWorker::initWithSession(
     const std::shared_ptr<TWReportingSession>& session) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const bool isEnabled = getEnableFlag(kEnableWhirlcap);
   if (!TWReportingUtilityIsInternalBuild() || !isEnabled) return nullptr;
   auto worker = std::make_shared<TWReportingSessionDPWorker>();
@@ -82,6 +84,7 @@ std::shared_ptr<TWReportingSessionDPWorker> TWReportingSessionDPWorker::initWith
 }
 
 std::optional<bool> TWReportingSessionDPWorker::start() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   started = true;
   return true;
 }
@@ -93,6 +96,7 @@ bool TWReportingSessionDPWorker::interestedInMessage(const TWReportingSessionMes
 }
 
 bool TWReportingSessionDPWorker::handleMessage(const TWReportingSessionMessage& message) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const double now = TWReportingContext::current().platform().clock.now();
   if (meetsConditions(message, now)) {
     requestTrace(message);

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "workers/sinks/TWReportingSessionDiagwireWorker.h"
 
+#include <cassert>
 #include <string>
 #include <string_view>
 
@@ -36,6 +37,7 @@ const TWReportingSessionWorkerClass TWReportingSessionDiagwireWorker::kWorkerCla
     workerClassOf<TWReportingSessionDiagwireWorker>("TWReportingSessionDiagwireWorker");
 
 bool TWReportingSessionDiagwireWorker::handleMessage(const TWReportingSessionMessage& message) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   if (message.type != kTypeIssueDetector) return false;
   diagwiremetrics::AudioIssueDetected record;
   setBytes(record.issuetype, message.message, "issue_type");

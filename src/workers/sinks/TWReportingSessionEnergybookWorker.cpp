@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "workers/sinks/TWReportingSessionEnergybookWorker.h"
 
+#include <cassert>
 #include <string_view>
 #include <utility>
 
@@ -44,6 +45,7 @@ const TWReportingSessionWorkerClass TWReportingSessionEnergybookWorker::kWorkerC
     workerClassOf<TWReportingSessionEnergybookWorker>("TWReportingSessionEnergybookWorker");
 
 bool TWReportingSessionEnergybookWorker::handleMessage(const TWReportingSessionMessage& message) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   if (message.type != kTypeEnergybook) return false;
   handleEngineOnDurationMessage(message.message);
   handleEngineStateMessage(message.message);

@@ -1,9 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "workers/sinks/TWReportingSessionMetriconWorker.h"
 
+#include <cassert>
+
 #include "platform/Metricon.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingSession.h"
+#include "session/TWReportingUtility.h"
 
 namespace tonewerk {
 
@@ -11,6 +14,7 @@ const TWReportingSessionWorkerClass TWReportingSessionMetriconWorker::kWorkerCla
     workerClassOf<TWReportingSessionMetriconWorker>("TWReportingSessionMetriconWorker");
 
 bool TWReportingSessionMetriconWorker::handleMessage(const TWReportingSessionMessage& message) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   TWReportingContext& context = TWReportingContext::current();
   Metricon& metricon = context.platform().metricon;
   const auto owner = session.lock();

@@ -1,11 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "workers/sinks/TWReportingSessionRtcWorker.h"
 
+#include <cassert>
 #include <utility>
 
 #include "session/StrandPool.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingSession.h"
+#include "session/TWReportingUtility.h"
 #include "workers/sinks/RtcReporter.h"
 
 namespace tonewerk {
@@ -15,6 +17,7 @@ const TWReportingSessionWorkerClass TWReportingSessionRtcWorker::kWorkerClass =
 
 std::shared_ptr<TWReportingSessionRtcWorker> TWReportingSessionRtcWorker::initWithSession(
     const std::shared_ptr<TWReportingSession>& session) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   if (session->serviceType() == kServiceTest) return nullptr;
   auto worker = std::make_shared<TWReportingSessionRtcWorker>();
   worker->session = session;
@@ -37,6 +40,7 @@ void TWReportingSessionRtcWorker::makeQueueOnFirstUse() {
 }
 
 std::optional<bool> TWReportingSessionRtcWorker::start() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto owner = session.lock();
   if (owner == nullptr || owner->serviceType() == kServiceTest) return false;
   RtcReporter::Start start;
@@ -52,6 +56,7 @@ std::optional<bool> TWReportingSessionRtcWorker::start() {
 }
 
 bool TWReportingSessionRtcWorker::handleMessage(const TWReportingSessionMessage& message) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   auto record = std::make_unique<TWReportingSessionMessage>(message.message, message.category, message.type);
   makeQueueOnFirstUse();
   const std::size_t bytes = sizeof(TWReportingSessionMessage) + record->message.bytes();
@@ -61,6 +66,7 @@ bool TWReportingSessionRtcWorker::handleMessage(const TWReportingSessionMessage&
 }
 
 void TWReportingSessionRtcWorker::stop() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto owner = session.lock();
   if (owner == nullptr) return;
   makeQueueOnFirstUse();

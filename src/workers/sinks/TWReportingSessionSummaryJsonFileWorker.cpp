@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "workers/sinks/TWReportingSessionSummaryJsonFileWorker.h"
 
+#include <cassert>
 #include <utility>
 #include <vector>
 
@@ -29,6 +30,7 @@ const TWReportingSessionWorkerClass TWReportingSessionSummaryJsonFileWorker::kWo
 
 std::shared_ptr<TWReportingSessionSummaryJsonFileWorker>
 TWReportingSessionSummaryJsonFileWorker::initWithSession(const std::shared_ptr<TWReportingSession>& session) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   if (session->serviceType() != kServiceTest && !TWReportingUtilityIsInternalBuild()) return nullptr;
   auto worker = std::make_shared<TWReportingSessionSummaryJsonFileWorker>();
   worker->session = session;
@@ -49,6 +51,7 @@ std::string TWReportingSessionSummaryJsonFileWorker::fileNameFor(const TWReporti
 }
 
 void TWReportingSessionSummaryJsonFileWorker::stop() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto owner = session.lock();
   if (owner == nullptr || owner->messages().empty()) return;
   std::vector<Entry> entries;

@@ -2,6 +2,7 @@
 #include "workers/sinks/TWReportingSessionSummaryWorker.h"
 
 #include <array>
+#include <cassert>
 #include <string>
 #include <string_view>
 
@@ -49,6 +50,7 @@ const TWReportingSessionWorkerClass TWReportingSessionSummaryWorker::kWorkerClas
     workerClassOf<TWReportingSessionSummaryWorker>("TWReportingSessionSummaryWorker");
 
 bool TWReportingSessionSummaryWorker::handleMessage(const TWReportingSessionMessage& message) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   if (const Value* duration = message.message.find(TWReportingMessageKeySessionDuration)) {
     totalActiveTime_ += duration->number();
     ++activeCount_;
@@ -60,6 +62,7 @@ bool TWReportingSessionSummaryWorker::handleMessage(const TWReportingSessionMess
 }
 
 void TWReportingSessionSummaryWorker::stop() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto owner = session.lock();
   if (owner == nullptr) return;
   owner->sendMessage(
