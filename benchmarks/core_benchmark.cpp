@@ -136,7 +136,7 @@ class Core {
     auto session =
         TWReportingSession::initWithID(reporterID, {4711}, std::make_shared<KeptBytesBudget>(kUnbounded));
     const ValueMap configuration{{"HostApplicationDisplayID", "com.example.player"}};
-    session->updateConfigurationWithContentsOfConfiguration(&configuration);
+    (void)session->updateConfigurationWithContentsOfConfiguration(&configuration);
     session->start();
     return session;
   }

@@ -57,7 +57,7 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   // Adds the map's entries. Its "QMHostApplicationDisplayID" becomes the application name, unless the map
   // has an application name, too. Null does nothing. Returns false, and changes nothing, when the budget
   // has no room.
-  bool updateConfigurationWithContentsOfConfiguration(const ValueMap* configuration);
+  [[nodiscard]] bool updateConfigurationWithContentsOfConfiguration(const ValueMap* configuration);
 
   void start();
   void startWorkersFromClasses(const std::vector<const TWReportingSessionWorkerClass*>& classes);

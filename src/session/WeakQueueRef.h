@@ -19,7 +19,7 @@ class WeakQueueRef {
 
   // Runs `work` on the queue. Called from the queue's own work, it runs `work` before it returns, else later.
   // Returns false, and does not run `work`, once close() has been called. Never waits for the queue.
-  bool run(Task work);
+  [[nodiscard]] bool run(Task work);
 
   // From now on run() runs nothing. Must be called before the queue ends.
   void close();

@@ -281,7 +281,7 @@ TEST_F(InputMessagesTest, SpatialMessagesTwoSecondsApartAreNot) {
 
 TEST_F(InputMessagesTest, StopSendsTheSummariesIntoTheSession) {
   const ValueMap configuration{{"HostApplicationDisplayID", "com.orvane.recorder"}};
-  session->updateConfigurationWithContentsOfConfiguration(&configuration);
+  EXPECT_TRUE(session->updateConfigurationWithContentsOfConfiguration(&configuration));
   session->start();
   const double now = test.clock.now();
   session->sendMessage(messageAt(now, {{kRunning, kOn}}));

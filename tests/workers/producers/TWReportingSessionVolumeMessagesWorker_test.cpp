@@ -212,7 +212,7 @@ TEST_F(VolumeMessagesTest, SpatialMessagesFiveSecondsApartAreNot) {
 
 TEST_F(VolumeMessagesTest, StopSendsTheSummariesIntoTheSession) {
   const ValueMap configuration{{"HostApplicationDisplayID", "com.orvane.player"}};
-  session->updateConfigurationWithContentsOfConfiguration(&configuration);
+  EXPECT_TRUE(session->updateConfigurationWithContentsOfConfiguration(&configuration));
   session->start();
   const double now = test.clock.now();
   session->sendMessage(messageAt(now + 3, {{kRunning, kOff}}));

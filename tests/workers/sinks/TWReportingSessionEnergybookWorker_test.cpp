@@ -22,7 +22,7 @@ class TWReportingSessionEnergybookWorkerTest : public ReportingTest {
  protected:
   void nameApplication(const Value& name) {
     const ValueMap configuration{{"HostApplicationDisplayID", name}};
-    session->updateConfigurationWithContentsOfConfiguration(&configuration);
+    EXPECT_TRUE(session->updateConfigurationWithContentsOfConfiguration(&configuration));
   }
   bool handle(const ValueMap& payload, AudioEventType type = kEnergybook) {
     return worker.handleMessage(TWReportingSessionMessage(payload, 1, type));

@@ -119,7 +119,7 @@ TEST_F(TWReportingSessionRtcWorkerTest, DescribesTheSessionToTheService) {
 TEST_F(TWReportingSessionRtcWorkerTest, AddsTheConfigurationToTheUserInfoAndTheApplicationToTheSessionInfo) {
   const ValueMap configuration{
       {"HostApplicationDisplayID", "org.example.player"}, {"TWReportingSessionID", "mine"}, {"extra", 1}};
-  session->updateConfigurationWithContentsOfConfiguration(&configuration);
+  EXPECT_TRUE(session->updateConfigurationWithContentsOfConfiguration(&configuration));
   startAndRun();
   EXPECT_EQ(service(0).sessionInfo.text("kLinkReportSessionInfoClientBundleID"), "org.example.player");
   EXPECT_EQ(service(0).userInfo, (ValueMap{{"kLinkReportUserInfoClientName", "com.orvane.tonewerk"},
@@ -132,7 +132,7 @@ TEST_F(TWReportingSessionRtcWorkerTest, AddsTheConfigurationToTheUserInfoAndTheA
 TEST_F(TWReportingSessionRtcWorkerTest, TakesTheConfigurationAsItWasAtTheStart) {
   session->start();
   const ValueMap later{{"extra", 1}};
-  session->updateConfigurationWithContentsOfConfiguration(&later);
+  EXPECT_TRUE(session->updateConfigurationWithContentsOfConfiguration(&later));
   run();
   EXPECT_FALSE(service(0).userInfo.contains("extra"));
 }

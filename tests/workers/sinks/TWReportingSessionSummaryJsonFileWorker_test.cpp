@@ -151,7 +151,7 @@ TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, MakesItsDirectoryAccessibleT
 
 TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, NamesTheFileByTimeIdentifierApplicationAndService) {
   const ValueMap configuration{{"HostApplicationDisplayID", "my app"}};
-  session->updateConfigurationWithContentsOfConfiguration(&configuration);
+  EXPECT_TRUE(session->updateConfigurationWithContentsOfConfiguration(&configuration));
   session->setServiceType(7);
   EXPECT_EQ(TWReportingSessionSummaryJsonFileWorker::fileNameFor(*session),
             "20251120-111800+0100-77-my app-longformaudio.json");
@@ -159,7 +159,7 @@ TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, NamesTheFileByTimeIdentifier
 
 TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, ANameThatWouldLeaveTheDirectoryFailsAndIsLogged) {
   const ValueMap configuration{{"HostApplicationDisplayID", "../../evil"}};
-  session->updateConfigurationWithContentsOfConfiguration(&configuration);
+  EXPECT_TRUE(session->updateConfigurationWithContentsOfConfiguration(&configuration));
   session->start();
   stop();
   EXPECT_THAT(test.files.files(), IsEmpty());

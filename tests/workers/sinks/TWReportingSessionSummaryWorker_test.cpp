@@ -42,7 +42,7 @@ TEST_F(TWReportingSessionSummaryWorkerTest, TheSummaryHasAllKeysInOrder) {
   test.system.setLoadAverages({0.5, 1.5, 2.5});
   test.processes.setFootprint(std::uint64_t{5} << 20);
   const ValueMap configuration{{"HostApplicationDisplayID", "com.orvane.player"}};
-  session->updateConfigurationWithContentsOfConfiguration(&configuration);
+  EXPECT_TRUE(session->updateConfigurationWithContentsOfConfiguration(&configuration));
   session->setServiceType(7);
   session->setClientProcessName("player");
   session->start();
