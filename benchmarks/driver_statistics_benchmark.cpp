@@ -97,7 +97,7 @@ class Benchmark {
   Benchmark() {
     std::filesystem::create_directory(channelsDirectory_);
     drivers_.goOn();
-    utility_ = &context_.singles().get<TWReportingDriverUtility>();  // that of every session
+    utility_ = &context_.singletons().get<TWReportingDriverUtility>();  // that of every session
     all_.emplace(channelsDirectory_, log_);
   }
 

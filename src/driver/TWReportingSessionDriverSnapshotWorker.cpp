@@ -14,14 +14,14 @@ const TWReportingSessionWorkerClass TWReportingSessionDriverSnapshotWorker::kWor
 
 std::optional<bool> TWReportingSessionDriverSnapshotWorker::start() {
   assert(TWReportingUtilityIsOnReportingServerQueue());
-  const auto& utility = TWReportingContext::current().singles().get<TWReportingDriverUtility>();
+  const auto& utility = TWReportingContext::current().singletons().get<TWReportingDriverUtility>();
   driverSnapShot_ = utility.getSnapShot();
   return true;
 }
 
 void TWReportingSessionDriverSnapshotWorker::stop() {
   assert(TWReportingUtilityIsOnReportingServerQueue());
-  const auto* utility = TWReportingContext::current().singles().find<TWReportingDriverUtility>();
+  const auto* utility = TWReportingContext::current().singletons().find<TWReportingDriverUtility>();
   if (utility == nullptr) return;  // no worker of this class has started yet in this process
   utility->sendDriverLogsForSession(session.lock().get(), driverSnapShot_ ? &*driverSnapShot_ : nullptr);
   driverSnapShot_.reset();

@@ -36,7 +36,9 @@ struct SharedMonitor {
   Mutex monitorMutex;  // no other lock is taken while it is held
   std::shared_ptr<TWReportingSystemMonitor> monitor GUARDED_BY(monitorMutex);
 
-  static SharedMonitor& ofProcess() { return TWReportingContext::current().singles().get<SharedMonitor>(); }
+  static SharedMonitor& ofProcess() {
+    return TWReportingContext::current().singletons().get<SharedMonitor>();
+  }
 
   std::shared_ptr<TWReportingSystemMonitor> get() {
     const MutexLock lock(monitorMutex);

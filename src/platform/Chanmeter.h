@@ -112,8 +112,8 @@ class Chanmeter {
   // - Duty cycles are recomputed from the residencies; they are 0 when the residencies sum to 0.
   // - Minimum, maximum and unit are those of `later`.
   // - A channel that is in only one of the two gives nothing.
-  // Returns null with kErrorNothingEarlier when `earlier` is null.
-  static constexpr std::int64_t kErrorNothingEarlier = 1;
+  // Returns null with kErrorNoEarlierSamples when `earlier` is null.
+  static constexpr std::int64_t kErrorNoEarlierSamples = 1;
   [[nodiscard]] virtual Samples createSamplesDelta(const Samples& earlier, const Samples& later,
                                                    std::optional<ChanmeterError>& error) = 0;
 

@@ -31,7 +31,7 @@ class MessagingConnection {
 
   // Sets who handles the requests. Call before resume(). `requests` must outlive the connection; `handler` is
   // kept until the invalidation handler has returned.
-  virtual void exportObject(const RequestSet& requests, std::shared_ptr<RequestHandler> handler) = 0;
+  virtual void setRequestHandler(const RequestSet& requests, std::shared_ptr<RequestHandler> handler) = 0;
 
   // Set the handlers that run when the connection has ended, in one direction or both: first the interruption
   // handler, then the invalidation handler, once each. Call before resume().

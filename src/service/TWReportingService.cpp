@@ -58,7 +58,7 @@ bool TWReportingService::listenerShouldAcceptNewConnection(MessagingConnection& 
       const auto listed = weakClient.lock();
       if (service != nullptr && listed != nullptr) registerClient(listed);
     });
-    connection.exportObject(
+    connection.setRequestHandler(
         requests::all(),
         std::make_shared<TWReportingServiceExport>(
             std::move(client), std::make_unique<WatchRequests>(processIdentifier, weak_from_this())));

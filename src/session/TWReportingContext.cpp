@@ -58,7 +58,7 @@ SerialQueue& TWReportingContext::reportingServerQueue() {
   std::call_once(reportingServerQueueOnce_, [this] {
     reportingServerQueue_ = platform_.queues.makeSerialQueue("com.orvane.tonewerk.reporting.server",
                                                              QueuePriority::kUserInteractive);
-    reportingServerQueueGate_ = std::make_shared<WeakQueueRef>(*reportingServerQueue_);
+    reportingServerQueueRef_ = std::make_shared<WeakQueueRef>(*reportingServerQueue_);
     livingReportingServerQueue_ = reportingServerQueue_.get();
   });
   return *livingReportingServerQueue_;
@@ -69,13 +69,13 @@ bool TWReportingContext::isOnReportingServerQueue() const {
   return queue == nullptr || queue->ownsThisThread();
 }
 
-std::shared_ptr<WeakQueueRef> TWReportingContext::reportingServerQueueGate() {
+std::shared_ptr<WeakQueueRef> TWReportingContext::reportingServerQueueRef() {
   reportingServerQueue();
-  return reportingServerQueueGate_;
+  return reportingServerQueueRef_;
 }
 
 void TWReportingContext::endReportingServerQueue() {
-  if (reportingServerQueueGate_ != nullptr) reportingServerQueueGate_->close();
+  if (reportingServerQueueRef_ != nullptr) reportingServerQueueRef_->close();
   reportingServerQueue_.reset();  // runs what is still queued, which may ask for the queue
   livingReportingServerQueue_ = nullptr;
 }

@@ -53,7 +53,7 @@ class TWReportingContext {
 
   // A reference to the work queue for handlers that may be called when the queue is gone. It is closed
   // before the queue ends.
-  std::shared_ptr<WeakQueueRef> reportingServerQueueGate();
+  std::shared_ptr<WeakQueueRef> reportingServerQueueRef();
 
   // The queue on which sinks write files, so that the work queue does not wait for a disk. Made on first use.
   SinkQueue& fileSinkQueue();
@@ -69,7 +69,7 @@ class TWReportingContext {
   const TWReportingSessionWorkerRegistry& workerRegistry();
 
   // The process-wide objects of the rooms above session/. They end after the context's queues.
-  SingletonRegistry& singles() { return singles_; }
+  SingletonRegistry& singletons() { return singles_; }
 
   // On the work queue.
   TWReportingNameTable& names() {
@@ -127,7 +127,7 @@ class TWReportingContext {
   std::once_flag reportingServerQueueOnce_;
   std::unique_ptr<SerialQueue> reportingServerQueue_;
   std::atomic<SerialQueue*> livingReportingServerQueue_ = nullptr;  // until the queue's last work has run
-  std::shared_ptr<WeakQueueRef> reportingServerQueueGate_;          // made with the work queue
+  std::shared_ptr<WeakQueueRef> reportingServerQueueRef_;           // made with the work queue
 };
 
 }  // namespace tonewerk

@@ -113,14 +113,14 @@ TEST_F(TWReportingDriverUtilityTest, ADriverWithoutChannelSetAndWithoutErrorIsLe
 }
 
 TEST_F(TWReportingDriverUtilityTest, AnErrorThatComesWithAChannelSetIsLoggedAndTheDriverSubscribed) {
-  chanmeter.fail(Operation::kCopyChannels, {.code = 7, .resultComes = true}, kSpeaker);
+  chanmeter.fail(Operation::kCopyChannels, {.code = 7, .returnsResult = true}, kSpeaker);
   const TWReportingDriverUtility utility;
   EXPECT_THAT(descriptionsOf(utility), ElementsAre("Speaker-(null)", "Tx-(null)"));
   EXPECT_THAT(logged(LogLevel::kError), ElementsAre("error 7 getting channels for driver Speaker-(null)"));
 }
 
 TEST_F(TWReportingDriverUtilityTest, AnErrorThatComesWithAChannelSetIsNotLoggedAsTheSubscriptions) {
-  chanmeter.fail(Operation::kCopyChannels, {.code = 7, .resultComes = true}, kSpeaker);
+  chanmeter.fail(Operation::kCopyChannels, {.code = 7, .returnsResult = true}, kSpeaker);
   chanmeter.fail(Operation::kCreateSubscription, {}, kSpeaker);
   const TWReportingDriverUtility utility;
   EXPECT_THAT(logged(LogLevel::kError), ElementsAre("error 7 getting channels for driver Speaker-(null)"));
@@ -151,7 +151,7 @@ TEST_F(TWReportingDriverUtilityTest, AHandleWithoutChannelsAndChannelsWithoutHan
 }
 
 TEST_F(TWReportingDriverUtilityTest, AnErrorThatComesWithASubscriptionIsNotLogged) {
-  chanmeter.fail(Operation::kCreateSubscription, {.code = 9, .resultComes = true});
+  chanmeter.fail(Operation::kCreateSubscription, {.code = 9, .returnsResult = true});
   const TWReportingDriverUtility utility;
   EXPECT_THAT(utility.ioChannelSubscriptions(), SizeIs(2));
   EXPECT_THAT(logged(LogLevel::kError), IsEmpty());
@@ -187,7 +187,7 @@ TEST_F(TWReportingDriverUtilityTest, ADriverThatAppearsLaterIsNotSampled) {
 TEST_F(TWReportingDriverUtilityTest, ASnapshotHoldsEachDriversSamplesUnderItsDescription) {
   const TWReportingDriverUtility utility;
   test.log.clear();
-  chanmeter.forgetCalls();
+  chanmeter.clearCalls();
   const auto snapshot = utility.getSnapShot();
   ASSERT_THAT(snapshot, SizeIs(2));
   EXPECT_TRUE(snapshot.contains("Speaker-(null)"));
@@ -215,7 +215,7 @@ TEST_F(TWReportingDriverUtilityTest, MissingSamplesWithoutAnErrorAreLeftOutSilen
 
 TEST_F(TWReportingDriverUtilityTest, AnErrorThatComesWithSamplesIsNotLogged) {
   const TWReportingDriverUtility utility;
-  chanmeter.fail(Operation::kCreateSamples, {.code = 5, .resultComes = true});
+  chanmeter.fail(Operation::kCreateSamples, {.code = 5, .returnsResult = true});
   EXPECT_THAT(utility.getSnapShot(), SizeIs(2));
   EXPECT_THAT(logged(LogLevel::kError), IsEmpty());
 }
@@ -289,7 +289,7 @@ TEST_F(TWReportingDriverUtilityTest, AStateChannelIsReportedAlsoWhenNothingChang
 TEST_F(TWReportingDriverUtilityTest, AReportWithoutSnapshotSendsNothingButTakesAndReleasesSamples) {
   const TWReportingDriverUtility utility;
   test.log.clear();
-  chanmeter.forgetCalls();
+  chanmeter.clearCalls();
   const auto session = makeSession();
   utility.sendDriverLogsForSession(session.get(), nullptr);
   EXPECT_THAT(sentTo(*session), IsEmpty());
@@ -350,7 +350,7 @@ TEST_F(TWReportingDriverUtilityTest, ADriverThatTheSnapshotLacksGetsADeltaAgains
   const TWReportingDriverUtility utility;
   chanmeter.fail(Operation::kCreateSamples, {.code = 5}, kSpeaker);
   const auto snapshot = utility.getSnapShot();
-  chanmeter.failNoMore();
+  chanmeter.stopFailing();
   test.log.clear();
   chanmeter.setRecords({simple(speaker("volts"), 12), simple(keyIn("Tx", "frames"), 101)});
   const auto session = makeSession();

@@ -107,14 +107,14 @@ TEST_F(TWReportingSessionDriverSnapshotWorkerTest, StopBeforeAnyStartInTheProces
   EXPECT_THAT(sentTo(*session), IsEmpty());
   EXPECT_THAT(chanmeter.calls(), IsEmpty());
   EXPECT_THAT(test.log.linesOf("twrd"), IsEmpty());
-  EXPECT_EQ(context->singles().find<TWReportingDriverUtility>(), nullptr);
+  EXPECT_EQ(context->singletons().find<TWReportingDriverUtility>(), nullptr);
 }
 
 TEST_F(TWReportingSessionDriverSnapshotWorkerTest, StopWithoutStartSendsNothingOnceAnotherHasStarted) {
   const auto otherSession = makeSession(78);
   TWReportingSessionDriverSnapshotWorker other(otherSession);
   EXPECT_EQ(other.start(), true);
-  chanmeter.forgetCalls();
+  chanmeter.clearCalls();
   setVolts(12);
   worker.stop();
   EXPECT_THAT(sentTo(*session), IsEmpty());
@@ -164,7 +164,7 @@ TEST_F(TWReportingSessionDriverSnapshotWorkerTest,
   std::vector<std::thread> threads;
   for (const auto& owner : sessions) {
     threads.emplace_back([&owner] {
-      const auto& sampler = TWReportingContext::current().singles().get<TWReportingDriverUtility>();
+      const auto& sampler = TWReportingContext::current().singletons().get<TWReportingDriverUtility>();
       const TWReportingDriverUtility::Snapshot snapshot = sampler.getSnapShot();
       sampler.sendDriverLogsForSession(owner.get(), &snapshot);
     });

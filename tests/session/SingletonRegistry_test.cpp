@@ -19,39 +19,39 @@ struct First {
 };
 
 struct Second {
-  explicit Second(SingletonRegistry& singles) : value(singles.get<First>(5).value + 1) {}
+  explicit Second(SingletonRegistry& singletons) : value(singletons.get<First>(5).value + 1) {}
   ~Second() { ends.emplace_back("second"); }
   int value;
 };
 
 TEST(SingletonRegistryTest, MakesEachObjectOnce) {
-  SingletonRegistry singles;
-  First& first = singles.get<First>(1);
-  EXPECT_EQ(&singles.get<First>(2), &first);
+  SingletonRegistry singletons;
+  First& first = singletons.get<First>(1);
+  EXPECT_EQ(&singletons.get<First>(2), &first);
   EXPECT_EQ(first.value, 1);
 }
 
 TEST(SingletonRegistryTest, FindsNothingBeforeTheFirstGet) {
-  SingletonRegistry singles;
-  EXPECT_EQ(singles.find<First>(), nullptr);
-  First& first = singles.get<First>(1);
-  EXPECT_EQ(singles.find<First>(), &first);
+  SingletonRegistry singletons;
+  EXPECT_EQ(singletons.find<First>(), nullptr);
+  First& first = singletons.get<First>(1);
+  EXPECT_EQ(singletons.find<First>(), &first);
 }
 
 TEST(SingletonRegistryTest, AnObjectMayUseAnotherAndEndsBeforeIt) {
   ends.clear();
   {
-    SingletonRegistry singles;
-    EXPECT_EQ(singles.get<Second>(singles).value, 6);
+    SingletonRegistry singletons;
+    EXPECT_EQ(singletons.get<Second>(singletons).value, 6);
   }
   EXPECT_THAT(ends, ElementsAre("second", "first"));
 }
 
 TEST(SingletonRegistryTest, ThreadsThatGetAtOnceShareOneObject) {
-  SingletonRegistry singles;
+  SingletonRegistry singletons;
   First* seen[2] = {};
-  std::thread one([&] { seen[0] = &singles.get<First>(1); });
-  std::thread other([&] { seen[1] = &singles.get<First>(2); });
+  std::thread one([&] { seen[0] = &singletons.get<First>(1); });
+  std::thread other([&] { seen[1] = &singletons.get<First>(2); });
   one.join();
   other.join();
   EXPECT_EQ(seen[0], seen[1]);

@@ -71,7 +71,7 @@ TEST(WeakQueueRefTest, WhileTheQueueEndsRunsAcceptedWorkAndNoRefusedWork) {
 class ContextQueueRefTest : public ReportingTest {};
 
 TEST_F(ContextQueueRefTest, TheContextsReferenceReachesTheWorkQueueAndClosesWithTheContext) {
-  const std::shared_ptr<WeakQueueRef> ref = context->reportingServerQueueGate();
+  const std::shared_ptr<WeakQueueRef> ref = context->reportingServerQueueRef();
   bool wasOnTheQueue = false;
   EXPECT_TRUE(ref->run([&] { wasOnTheQueue = context->reportingServerQueue().isCurrent(); }));
   test.queues.runAll();

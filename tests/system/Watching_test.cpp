@@ -14,7 +14,7 @@
 #include <vector>
 
 #include "service/TapSubscriber.h"
-#include "support/Stranger.h"
+#include "support/OtherUser.h"
 #include "support/TemporaryDirectory.h"
 #include "system/support/DaemonTest.h"
 #include "system/support/PseudoTerminal.h"
@@ -176,7 +176,7 @@ TEST_F(WatchingTest, AnotherUserIsRefused) {
   std::filesystem::permissions(socket.parent_path().parent_path(), enter);
   std::filesystem::permissions(socket.parent_path(), enter);
   std::filesystem::permissions(socket, perms::all);
-  runAsStranger([&] {
+  runAsOtherUser([&] {
     DaemonClient stranger = connect();
     stranger.create(78);  // which everybody may
     const std::map<std::string, Arguments> requests{

@@ -28,7 +28,7 @@ Chanmeter::Samples RecordChanmeter::createSamplesDelta(const Samples& earlier, c
                                                        std::optional<ChanmeterError>& error) {
   assert(later != nullptr);
   if (earlier == nullptr) {
-    error = ChanmeterError{kErrorNothingEarlier};
+    error = ChanmeterError{kErrorNoEarlierSamples};
     return nullptr;
   }
   return std::make_shared<ChanmeterRecordSamples>(

@@ -25,7 +25,7 @@ constexpr double kThresholdDurationSeconds = 60.0;
 
 std::shared_ptr<WorkerInstanceState> sharedState() {
   assert(TWReportingUtilityIsOnReportingServerQueue());
-  auto& states = TWReportingContext::current().singles().get<SharedWorkerInstanceStates>().byClassName;
+  auto& states = TWReportingContext::current().singletons().get<SharedWorkerInstanceStates>().byClassName;
   auto& state = states[std::string(TWReportingCapsaWorkerInstanceHapticLeaks::kInstanceClass.name)];
   if (state == nullptr) {
     state = std::make_shared<WorkerInstanceState>();

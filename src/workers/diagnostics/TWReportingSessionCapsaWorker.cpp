@@ -69,7 +69,7 @@ std::shared_ptr<TWReportingSessionCapsaWorker> TWReportingSessionCapsaWorker::in
   auto worker = std::make_shared<TWReportingSessionCapsaWorker>();
   worker->session = session;
   TWReportingContext& context = TWReportingContext::current();
-  context.singles().get<SharedWorkerInstanceStates>();
+  context.singletons().get<SharedWorkerInstanceStates>();
   if (context.platform().deviceFacts.boolean(kHapticLeakCaptureProperty).value_or(false)) {
     worker->addInstance(TWReportingCapsaWorkerInstanceHapticLeaks::kInstanceClass);
   }

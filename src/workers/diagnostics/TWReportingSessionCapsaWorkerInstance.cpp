@@ -19,7 +19,7 @@ LogSite TWReportingSessionCapsaWorkerInstance::logSite(int line) {
 // handler holds the state weakly: an answer that never comes must not keep it alive.
 FaultsignReporter::Reply TWReportingSessionCapsaWorkerInstance::replyHandler(
     const std::shared_ptr<WorkerInstanceState>& state, LogReply log) {
-  return [gate = TWReportingContext::current().reportingServerQueueGate(), weak = std::weak_ptr(state),
+  return [gate = TWReportingContext::current().reportingServerQueueRef(), weak = std::weak_ptr(state),
           log = std::move(log)](const std::optional<ValueMap>& response) {
     // False once the daemon ends. The answer is not needed then.
     (void)gate->run([weak, log, response] {

@@ -139,7 +139,7 @@ TrackletDraft TWReportingSessionIssueDraftWorker::trackletDraftForVidroXYerror()
 
 TWReportingDefaults& TWReportingSessionIssueDraftWorker::defaults() {
   TWReportingContext& context = TWReportingContext::current();
-  return context.singles().get<TWReportingDefaults>(context.platform().preferences);
+  return context.singletons().get<TWReportingDefaults>(context.platform().preferences);
 }
 
 }  // namespace tonewerk

@@ -30,7 +30,7 @@ using Commands = std::array<std::string, 2>;
 // The preference if it is an array of two texts, else the default tools.
 Commands toolCommands() {
   TWReportingContext& context = TWReportingContext::current();
-  const auto& defaults = context.singles().get<TWReportingDefaults>(context.platform().preferences);
+  const auto& defaults = context.singletons().get<TWReportingDefaults>(context.platform().preferences);
   Commands commands{"tw-memory-usage", "slabtop --once"};
   const std::optional<Value> preference = defaults.read(kMemoryTools);
   if (!preference) return commands;
@@ -110,7 +110,7 @@ bool TWReportingSessionMemoryLogWorker::handleMessage(const TWReportingSessionMe
   assert(TWReportingUtilityIsOnReportingServerQueue());
   if (message.type != kTypeMemoryLog) return false;
   TWReportingContext& context = TWReportingContext::current();
-  if (!context.singles().get<MemoryLogLimiter>().claim(context.platform().clock)) return false;
+  if (!context.singletons().get<MemoryLogLimiter>().claim(context.platform().clock)) return false;
   try {
     logMemory();
   } catch (const std::system_error& error) {

@@ -29,7 +29,7 @@ constexpr double kSecondsBetweenRequests = 10.0;
 constexpr std::string_view kDroppedWhirlcapNotification = "com.orvane.tonewerk.dropped-whirlcap";
 
 TWReportingDPSettings& settings() {
-  return TWReportingContext::current().singles().get<TWReportingDPSettings>();
+  return TWReportingContext::current().singletons().get<TWReportingDPSettings>();
 }
 
 std::optional<Value> readDefault(std::string_view key) {
@@ -118,7 +118,7 @@ bool TWReportingSessionDPWorker::meetsConditions(const TWReportingSessionMessage
 
 const TWReportingDefaults& TWReportingSessionDPWorker::getUserDefaults() {
   TWReportingContext& context = TWReportingContext::current();
-  return context.singles().get<TWReportingDefaults>(context.platform().preferences);
+  return context.singletons().get<TWReportingDefaults>(context.platform().preferences);
 }
 
 bool TWReportingSessionDPWorker::getEnableFlag(std::string_view key) {

@@ -29,7 +29,7 @@ void MemoryChanmeter::fail(Operation operation, Failure failure, std::optional<G
   rules_.push_back({operation, failure, std::move(onlyOf)});
 }
 
-void MemoryChanmeter::failNoMore() {
+void MemoryChanmeter::stopFailing() {
   const MutexLock lock(mutex_);
   rules_.clear();
 }
@@ -39,7 +39,7 @@ std::vector<std::string> MemoryChanmeter::calls() const {
   return calls_;
 }
 
-void MemoryChanmeter::forgetCalls() {
+void MemoryChanmeter::clearCalls() {
   const MutexLock lock(mutex_);
   calls_.clear();
 }
@@ -67,7 +67,7 @@ bool MemoryChanmeter::fails(Operation operation, const Group& group,
   const Failure* failure = failureOf(operation, group);
   if (failure == nullptr) return false;
   if (failure->code) error = ChanmeterError{*failure->code};
-  return !failure->resultComes;
+  return !failure->returnsResult;
 }
 
 Chanmeter::Channels MemoryChanmeter::copyChannelsInGroup(const std::optional<std::string>& group,

@@ -30,7 +30,7 @@ class MemoryChanmeter final : public RecordChanmeter {
   };
   struct Failure {
     std::optional<std::int64_t> code = {};  // none: it returns nothing and no error
-    bool resultComes = false;               // it returns a result in spite of the error
+    bool returnsResult = false;             // it returns a result in spite of the error
   };
   // A group as passed to copyChannelsInGroup().
   struct Group {
@@ -43,12 +43,12 @@ class MemoryChanmeter final : public RecordChanmeter {
   void setRecords(std::vector<ChanmeterRecord> records);
   // From now on that operation fails, for one group or for all.
   void fail(Operation operation, Failure failure, std::optional<Group> onlyOf = std::nullopt);
-  void failNoMore();
+  void stopFailing();
 
   // Returns the calls in order, such as "copyChannelsInGroup Speaker-(null)". iterate() and channelCount()
   // are not recorded.
   std::vector<std::string> calls() const;
-  void forgetCalls();
+  void clearCalls();
   // Returns how many samples and deltas still exist.
   std::size_t heldSamples() const;
 

@@ -36,7 +36,7 @@ std::vector<MemoryCommandRunner::Run> MemoryCommandRunner::runs() const {
   return runs_;
 }
 
-void MemoryCommandRunner::awaitRuns(std::size_t count) {
+void MemoryCommandRunner::waitForRuns(std::size_t count) {
   MutexLock lock(mutex_);
   while (runs_.size() < count) changed_.wait(lock);
 }

@@ -36,7 +36,7 @@ class MemoryCommandRunner final : public CommandRunner {
   // Returns the runs in the order in which they began.
   std::vector<Run> runs() const;
   // Returns when `count` runs have begun.
-  void awaitRuns(std::size_t count);
+  void waitForRuns(std::size_t count);
 
  private:
   mutable Mutex mutex_;

@@ -24,7 +24,7 @@ class MemoryClient::Connection final : public MessagingConnection,
   std::string description() const override {
     return "memory connection of " + std::to_string(processIdentifier_);
   }
-  void exportObject(const RequestSet& requests, std::shared_ptr<RequestHandler> handler) override {
+  void setRequestHandler(const RequestSet& requests, std::shared_ptr<RequestHandler> handler) override {
     requests_ = &requests;
     handler_ = std::move(handler);
   }

@@ -26,9 +26,9 @@ constexpr std::size_t kMegabyte = std::size_t{1} << 20;
 
 // What an idle daemon may have more than before: what the allocator is left with, and as much for caches that
 // have filled meanwhile.
-constexpr std::size_t kBound = 2 * AllocatorReclaimer::kSpareBytes;
+constexpr std::size_t kBound = 2 * AllocatorReclaimer::kMaxIdleBytes;
 // The last look is after half of it.
-constexpr std::chrono::seconds kPatience{2 * AllocatorReclaimer::kLastLook};
+constexpr std::chrono::seconds kPatience{2 * AllocatorReclaimer::kLastCheckSeconds};
 
 class MemoryReleaseTest : public DaemonTest {
  protected:

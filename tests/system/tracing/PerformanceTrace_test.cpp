@@ -9,7 +9,7 @@
 #include <string>
 #include <vector>
 
-#include "support/TracingTurn.h"
+#include "support/TracingLock.h"
 #include "system/support/DaemonTest.h"
 
 namespace tonewerk {
@@ -97,7 +97,7 @@ class PerformanceTraceTest : public DaemonTest {
     return found;
   }
 
-  const TracingTurn turn;
+  const TracingLock turn;
 };
 
 TEST_F(PerformanceTraceTest, ATestSessionLeavesHowLongItsIntervalsTook) {

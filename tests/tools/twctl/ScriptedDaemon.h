@@ -77,7 +77,7 @@ class ScriptedDaemon {
    public:
     explicit Delegate(ScriptedDaemon& daemon) : daemon_(daemon) {}
     bool listenerShouldAcceptNewConnection(MessagingConnection& connection) override {
-      connection.exportObject(requests::all(), std::make_shared<Object>(daemon_));
+      connection.setRequestHandler(requests::all(), std::make_shared<Object>(daemon_));
       connection.resume();
       return true;
     }

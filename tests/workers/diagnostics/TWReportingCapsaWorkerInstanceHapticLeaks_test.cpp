@@ -189,7 +189,7 @@ TEST_F(TWReportingCapsaWorkerInstanceHapticLeaksTest, TheStateOutlivesItsSession
   const auto later = makeWorker();
   EXPECT_EQ(&state(*later), before);
   EXPECT_EQ(state(*later).interestedCount, 1);
-  const auto& states = context->singles().find<SharedWorkerInstanceStates>()->byClassName;
+  const auto& states = context->singletons().find<SharedWorkerInstanceStates>()->byClassName;
   ASSERT_THAT(states, SizeIs(1));
   EXPECT_EQ(states.begin()->first, "TWReportingCapsaWorkerInstanceHapticLeaks");
 }

@@ -133,10 +133,10 @@ TEST_F(TWReportingSessionCapsaWorkerTest, AnInstanceThatDoesNotApplyToTheSession
 }
 
 TEST_F(TWReportingSessionCapsaWorkerTest, TheFirstWorkerMakesTheSharedStates) {
-  EXPECT_EQ(context->singles().find<SharedWorkerInstanceStates>(), nullptr);
+  EXPECT_EQ(context->singletons().find<SharedWorkerInstanceStates>(), nullptr);
   test.deviceFacts.set("HapticLeakCapture", false);
   EXPECT_NE(TWReportingSessionCapsaWorker::initWithSession(session), nullptr);
-  const auto* states = context->singles().find<SharedWorkerInstanceStates>();
+  const auto* states = context->singletons().find<SharedWorkerInstanceStates>();
   ASSERT_NE(states, nullptr);
   EXPECT_THAT(states->byClassName, IsEmpty());
 }

@@ -185,7 +185,7 @@ TEST_F(TWReportingSessionMemoryLogWorkerTest, BothToolsRunAtOnceAndTheHandlerWai
   test.commands.hold("slabtop --once");
   test.commands.hold("tw-memory-usage");
   auto handled = handleOnAnotherThread();
-  test.commands.awaitRuns(2);  // neither waits for the other
+  test.commands.waitForRuns(2);  // neither waits for the other
   test.commands.release("tw-memory-usage");
   EXPECT_THAT(blocks(), IsEmpty());  // the second tool's output must come first
   EXPECT_NE(handled.wait_for(std::chrono::seconds(0)), std::future_status::ready);
@@ -197,7 +197,7 @@ TEST_F(TWReportingSessionMemoryLogWorkerTest, BothToolsRunAtOnceAndTheHandlerWai
 TEST_F(TWReportingSessionMemoryLogWorkerTest, TheLimiterIsNotLockedWhileTheToolsRun) {
   test.commands.hold("slabtop --once");
   auto handled = handleOnAnotherThread();
-  test.commands.awaitRuns(2);
+  test.commands.waitForRuns(2);
   EXPECT_FALSE(handle());  // would never return if the limiter stayed locked
   test.commands.release("slabtop --once");
   handled.get();

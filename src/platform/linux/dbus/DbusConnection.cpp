@@ -43,7 +43,7 @@ std::string DbusConnection::description() const {
          std::to_string(peer_.processIdentifier) + ", user " + user + ", on D-Bus as " + name_;
 }
 
-void DbusConnection::exportObject(const RequestSet&, std::shared_ptr<RequestHandler> object) {
+void DbusConnection::setRequestHandler(const RequestSet&, std::shared_ptr<RequestHandler> object) {
   object_ = std::move(object);
 }
 

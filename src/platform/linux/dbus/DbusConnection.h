@@ -60,7 +60,7 @@ class DbusConnection final : public MessagingConnection {
   std::int32_t processIdentifier() const override { return peer_.processIdentifier; }
   std::uint32_t userIdentifier() const override { return peer_.userIdentifier; }
   std::string description() const override;
-  void exportObject(const RequestSet& interface, std::shared_ptr<RequestHandler> object) override;
+  void setRequestHandler(const RequestSet& interface, std::shared_ptr<RequestHandler> object) override;
   void setInterruptionHandler(std::function<void()> handler) override { interrupted_ = std::move(handler); }
   void setInvalidationHandler(std::function<void()> handler) override { invalidated_ = std::move(handler); }
   void resume() override;

@@ -25,7 +25,7 @@ std::size_t residentBytes() {
 
 std::size_t idleBytesOfTheProcess() {
   const std::size_t resident = residentBytes();
-  if (resident <= AllocatorReclaimer::kSpareBytes) return 0;  // cannot be above kSpareBytes
+  if (resident <= AllocatorReclaimer::kMaxIdleBytes) return 0;  // cannot be above kMaxIdleBytes
   const struct mallinfo2 all = ::mallinfo2();
   const std::size_t used = all.uordblks + all.hblkhd;
   return resident - std::min(used, resident);
@@ -59,7 +59,7 @@ struct AllocatorReclaimer::Checks {
   }
 
   void tick() {
-    if (isCheckDue() && allocator.idleBytes() > kSpareBytes) allocator.giveBack();
+    if (isCheckDue() && allocator.idleBytes() > kMaxIdleBytes) allocator.giveBack();
   }
 
   bool isCheckDue() {
@@ -67,7 +67,7 @@ struct AllocatorReclaimer::Checks {
     // A request from now on makes another series of checks follow this one.
     if (seconds == 0) isRequested = false;
     const bool isDue = isPowerOfTwo(++seconds);
-    if (seconds < kLastLook) return isDue;
+    if (seconds < kLastCheckSeconds) return isDue;
     seconds = 0;
     if (!isRequested) timer = nullptr;
     return isDue;

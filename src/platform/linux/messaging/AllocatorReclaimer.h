@@ -33,12 +33,12 @@ struct Allocator {
 class AllocatorReclaimer {
  public:
   // The allocator may keep this many free bytes, because it soon uses them again.
-  static constexpr std::size_t kSpareBytes = std::size_t{16} << 20;
+  static constexpr std::size_t kMaxIdleBytes = std::size_t{16} << 20;
   // Clients may send this many bytes in the daemon's life before the first check. An unfinished frame may
-  // hold forty times its bytes in memory, so that these can leave little more than kSpareBytes.
+  // hold forty times its bytes in memory, so that these can leave little more than kMaxIdleBytes.
   static constexpr std::size_t kSentBytesThreshold = std::size_t{512} << 10;
   static constexpr std::chrono::seconds kFirstCheck{1};
-  static constexpr int kLastLook = 32;
+  static constexpr int kLastCheckSeconds = 32;
 
   // `timers` outlives it. Checks run on the timers' thread.
   explicit AllocatorReclaimer(TimerService& timers, Allocator allocator = Allocator::ofTheProcess());

@@ -63,7 +63,7 @@ std::string UnixConnection::description() const {
          ", user " + std::to_string(userIdentifier_);
 }
 
-void UnixConnection::exportObject(const RequestSet& interface, std::shared_ptr<RequestHandler> object) {
+void UnixConnection::setRequestHandler(const RequestSet& interface, std::shared_ptr<RequestHandler> object) {
   interface_ = &interface;
   object_ = std::move(object);
 }

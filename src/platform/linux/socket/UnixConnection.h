@@ -51,7 +51,7 @@ class UnixConnection final : public MessagingConnection {
   std::int32_t processIdentifier() const override { return processIdentifier_; }
   std::uint32_t userIdentifier() const override { return userIdentifier_; }
   std::string description() const override;
-  void exportObject(const RequestSet& interface, std::shared_ptr<RequestHandler> object) override;
+  void setRequestHandler(const RequestSet& interface, std::shared_ptr<RequestHandler> object) override;
   void setInterruptionHandler(std::function<void()> handler) override { interrupted_ = std::move(handler); }
   void setInvalidationHandler(std::function<void()> handler) override { invalidated_ = std::move(handler); }
   void resume() override;

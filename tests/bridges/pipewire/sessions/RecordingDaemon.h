@@ -78,7 +78,7 @@ class RecordingDaemon final : private MessagingListenerDelegate {
   static const RequestSet& interface() { return requests::all(); }
 
   bool listenerShouldAcceptNewConnection(MessagingConnection& connection) override {
-    connection.exportObject(interface(), std::make_shared<Object>(*this));
+    connection.setRequestHandler(interface(), std::make_shared<Object>(*this));
     connection.resume();
     return true;
   }

@@ -196,7 +196,7 @@ TYPED_TEST(ChanmeterContract, TakesNoDifferenceAgainstNothing) {
   std::optional<ChanmeterError> error;
   const auto later = this->samplesOf(this->channelsIn(std::nullopt, std::nullopt));
   EXPECT_FALSE(this->chanmeter().createSamplesDelta(nullptr, later, error));
-  EXPECT_EQ(error.value_or(ChanmeterError{}).code, Chanmeter::kErrorNothingEarlier);
+  EXPECT_EQ(error.value_or(ChanmeterError{}).code, Chanmeter::kErrorNoEarlierSamples);
 }
 
 TYPED_TEST(ChanmeterContract, TakesDifferences) {

@@ -101,9 +101,9 @@ TEST(ChannelDocumentationTest, HasASchemaThatAgreesWithTheReader) {
 }
 
 TEST(ChannelDocumentationTest, NamesEveryFailureAndBound) {
-  EXPECT_EQ(Chanmeter::kErrorNothingEarlier, 1);
+  EXPECT_EQ(Chanmeter::kErrorNoEarlierSamples, 1);
   const std::pair<std::int64_t, const char*> failures[] = {
-      {Chanmeter::kErrorNothingEarlier, "against nothing"},
+      {Chanmeter::kErrorNoEarlierSamples, "against nothing"},
       {kChannelsUnreadable, "no regular file"},
       {kChannelsTooLarge, "larger than 1 MiB"},
       {kChannelsNotJson, "no JSON"},

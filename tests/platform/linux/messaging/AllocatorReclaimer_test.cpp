@@ -13,7 +13,7 @@ namespace {
 
 using ::testing::ElementsAre;
 
-constexpr std::size_t kSpare = AllocatorReclaimer::kSpareBytes;
+constexpr std::size_t kSpare = AllocatorReclaimer::kMaxIdleBytes;
 
 class AllocatorReclaimerTest : public ::testing::Test {
  protected:

@@ -152,7 +152,7 @@ class RigDelegate final : public MessagingListenerDelegate {
     }
     lastProcessIdentifier = connection.processIdentifier();
     lastUserIdentifier = connection.userIdentifier();
-    connection.exportObject(rigInterface(), std::make_shared<RigObject>(record_));
+    connection.setRequestHandler(rigInterface(), std::make_shared<RigObject>(record_));
     connection.setInterruptionHandler([this] { record_.add("interrupted"); });
     connection.setInvalidationHandler([this] { record_.add("invalidated"); });
     connection.resume();

@@ -14,7 +14,7 @@
 #include <unistd.h>
 #include <vector>
 
-#include "support/Stranger.h"
+#include "support/OtherUser.h"
 #include "support/TemporaryDirectory.h"
 #include "support/memory/MemoryLog.h"
 
@@ -429,7 +429,7 @@ TEST_F(DirectoryWatcherTest, ADirectoryThatBecomesReadableIsFollowed) {
   fs::permissions(root.path(), kEverybodys);
   fs::permissions(parent, kEverybodys);
   fs::permissions(watched, fs::perms::owner_all);
-  runAsStranger([this] { watch(); });  // the watcher's thread is one, too
+  runAsOtherUser([this] { watch(); });  // the watcher's thread is one, too
   fs::permissions(watched, kEverybodys);
   EXPECT_TRUE(waitFor(kEverything));
   write(path("a"));

@@ -10,7 +10,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include "support/Stranger.h"
+#include "support/OtherUser.h"
 #include "support/TemporaryDirectory.h"
 
 namespace tonewerk {
@@ -138,11 +138,11 @@ TEST_F(NotificationFilesTest, WhatRootPostsTheDirectorysOwnerCanPostAgain) {
   if (geteuid() != 0) GTEST_SKIP() << "only root can be root";
   const std::string runtime = directory.path("a");
   std::filesystem::create_directory(runtime);
-  ASSERT_EQ(chown(directory.path().c_str(), kStranger, kStranger), 0);
-  ASSERT_EQ(chown(runtime.c_str(), kStranger, kStranger), 0);
+  ASSERT_EQ(chown(directory.path().c_str(), kOtherUser, kOtherUser), 0);
+  ASSERT_EQ(chown(runtime.c_str(), kOtherUser, kOtherUser), 0);
   EXPECT_FALSE(files.post("stated", 5));
   EXPECT_FALSE(files.post("unstated"));
-  runAsStranger([this] {
+  runAsOtherUser([this] {
     EXPECT_FALSE(files.post("stated"));
     EXPECT_FALSE(files.post("unstated"));
     EXPECT_FALSE(files.post("unstated", 7));

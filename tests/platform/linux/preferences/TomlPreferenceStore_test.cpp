@@ -12,7 +12,7 @@
 #include <utility>
 #include <vector>
 
-#include "support/Stranger.h"
+#include "support/OtherUser.h"
 #include "support/TemporaryDirectory.h"
 #include "support/memory/MemoryLog.h"
 
@@ -187,8 +187,8 @@ class PreferencesOfRootTest : public TomlPreferenceStoreTest {
   void SetUp() override {
     if (geteuid() != 0) GTEST_SKIP() << "only root can be root";
     std::filesystem::create_directory(state_);
-    ASSERT_EQ(chown(directory_.path().c_str(), kStranger, kStranger), 0);
-    ASSERT_EQ(chown(state_.c_str(), kStranger, kStranger), 0);
+    ASSERT_EQ(chown(directory_.path().c_str(), kOtherUser, kOtherUser), 0);
+    ASSERT_EQ(chown(state_.c_str(), kOtherUser, kOtherUser), 0);
   }
 
   static std::pair<uid_t, gid_t> ownerOf(const std::string& path) {
@@ -197,7 +197,7 @@ class PreferencesOfRootTest : public TomlPreferenceStoreTest {
     return {status.st_uid, status.st_gid};
   }
 
-  static constexpr std::pair<uid_t, gid_t> kDaemons{kStranger, kStranger};
+  static constexpr std::pair<uid_t, gid_t> kDaemons{kOtherUser, kOtherUser};
   static constexpr std::pair<uid_t, gid_t> kRoots{0, 0};
 
   const std::string state_ = directory_.path("daemon");
@@ -214,7 +214,7 @@ TEST_F(PreferencesOfRootTest, WhatRootWritesIsTheStateDirectorysOwners) {
 
 TEST_F(PreferencesOfRootTest, TheDaemonGoesOnWritingWhereRootHasWritten) {
   EXPECT_FALSE(roots_.write(kDomain, "a", 1));
-  runAsStranger([&] {
+  runAsOtherUser([&] {
     TomlPreferenceStore daemons(directory_.path("configuration"), preferences_, category_);
     std::string problem;
     EXPECT_FALSE(daemons.write(kDomain, "b", 2, &problem)) << problem;
@@ -228,7 +228,7 @@ TEST_F(PreferencesOfRootTest, NothingIsGivenAwayThatWasThereBefore) {
   const std::string secret = directory_.path("secret");
   write(secret, "root's\n");
   std::filesystem::create_directory(preferences_);
-  ASSERT_EQ(chown(preferences_.c_str(), kStranger, kStranger), 0);
+  ASSERT_EQ(chown(preferences_.c_str(), kOtherUser, kOtherUser), 0);
   std::filesystem::create_hard_link(secret, preferences_ + "/.lock");
   std::filesystem::create_hard_link(secret, preferences_ + "/com.orvane.test.toml.new");
   EXPECT_FALSE(roots_.write(kDomain, "a", 1));

@@ -27,7 +27,7 @@
 #include "platform/linux/protobuf/Hex.h"
 #include "platform/linux/socket/RawClient.h"
 #include "platform/linux/threads/SystemClock.h"
-#include "support/Stranger.h"
+#include "support/OtherUser.h"
 #include "support/TemporaryDirectory.h"
 #include "support/memory/MemoryLog.h"
 
@@ -228,7 +228,7 @@ class OtherUserTest : public UnixSocketListenerTest {
     EXPECT_EQ(::chmod(directory.path().c_str(), 0711), 0);
     EXPECT_EQ(::chmod(path.c_str(), 0666), 0);
     std::unique_ptr<RawClient> client;
-    runAsStranger([&] { client = std::make_unique<RawClient>(path); });
+    runAsOtherUser([&] { client = std::make_unique<RawClient>(path); });
     return client;
   }
 };

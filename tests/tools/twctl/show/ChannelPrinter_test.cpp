@@ -108,7 +108,7 @@ TEST_F(ChannelPrinterTest, ShowsWhatThePatternsFit) {
 
 TEST_F(ChannelPrinterTest, SaysThatSomethingFailedBesideWhatIsThere) {
   chanmeter_.setRecords({simple(speaker("Volts"), 12)});
-  chanmeter_.fail(MemoryChanmeter::Operation::kCopyChannels, {.code = 5, .resultComes = true});
+  chanmeter_.fail(MemoryChanmeter::Operation::kCopyChannels, {.code = 5, .returnsResult = true});
   EXPECT_THAT(values(), HasSubstr("Volts"));
   EXPECT_FALSE(succeeded_);
   chanmeter_.fail(MemoryChanmeter::Operation::kCreateSamples, {.code = 5});
@@ -151,7 +151,7 @@ TEST_F(ChannelPrinterTest, GoesOnWhereItWasWhenNothingCouldBeRead) {
   changes();
   chanmeter_.fail(MemoryChanmeter::Operation::kCreateSamples, {.code = 5});
   EXPECT_THAT(changes(), IsEmpty());
-  chanmeter_.failNoMore();
+  chanmeter_.stopFailing();
   chanmeter_.setRecords({simple(speaker("a"), 3)});
   EXPECT_THAT(changes(), HasSubstr(" 2 "));
 }

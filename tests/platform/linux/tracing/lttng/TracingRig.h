@@ -17,7 +17,7 @@
 #include "platform/linux/tracing/lttng/LttngRuntrace.h"
 #include "platform/linux/tracing/lttng/TraceReaderKolvi.h"
 #include "support/TemporaryDirectory.h"
-#include "support/TracingTurn.h"
+#include "support/TracingLock.h"
 #include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
@@ -84,7 +84,7 @@ class TracingRig {
   static pid_t sessionDaemon() { return childNamed("lttng-sessiond", ::getpid()); }
   static pid_t writerOf(pid_t sessionDaemon) { return childNamed("lttng-consumerd", sessionDaemon); }
 
-  const TracingTurn turn;
+  const TracingLock turn;
   const TemporaryDirectory directory;
   MemoryLog log;
   const LogCategory category{log, "com.orvane.tonewerk", "twrs"};

@@ -11,13 +11,13 @@
 namespace tonewerk {
 
 // A user that is neither root nor the user that tests run as: nobody.
-inline constexpr std::uint32_t kStranger = 65'534;
+inline constexpr std::uint32_t kOtherUser = 65'534;
 
 // Runs `work` as that user, on a thread of its own, and returns when it has run. Only root can call it.
-inline void runAsStranger(const std::function<void()>& work) {
+inline void runAsOtherUser(const std::function<void()>& work) {
   std::thread otherUser([&work] {
     // The system call changes only this thread; the library's function would change all threads.
-    ASSERT_EQ(::syscall(SYS_setresuid, -1, kStranger, -1), 0);
+    ASSERT_EQ(::syscall(SYS_setresuid, -1, kOtherUser, -1), 0);
     work();
   });
   otherUser.join();

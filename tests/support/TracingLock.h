@@ -11,12 +11,12 @@ namespace tonewerk {
 
 // Makes the tests of one user that use a real tracer run one after the other, also in different programs:
 // each user has one session daemon for the whole machine.
-class TracingTurn {
+class TracingLock {
  public:
-  TracingTurn() { EXPECT_EQ(::flock(file_, LOCK_EX), 0); }
-  TracingTurn(const TracingTurn&) = delete;
-  TracingTurn& operator=(const TracingTurn&) = delete;
-  ~TracingTurn() { ::close(file_); }
+  TracingLock() { EXPECT_EQ(::flock(file_, LOCK_EX), 0); }
+  TracingLock(const TracingLock&) = delete;
+  TracingLock& operator=(const TracingLock&) = delete;
+  ~TracingLock() { ::close(file_); }
 
  private:
   static int open() {
