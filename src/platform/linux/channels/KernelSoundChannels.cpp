@@ -172,7 +172,7 @@ void KernelSoundChannels::addIfChosen(Reading& reading, ChanmeterRecord record) 
 }
 
 std::shared_ptr<const ChanmeterRecord> KernelSoundChannels::shared(ChanmeterRecord record) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   if (latest_.size() >= kMaxKept) latest_.clear();  // cards came and went
   auto& latest = latest_[record.key];
   if (latest == nullptr || *latest != record) {
@@ -184,7 +184,7 @@ std::shared_ptr<const ChanmeterRecord> KernelSoundChannels::shared(ChanmeterReco
 void KernelSoundChannels::complain(Reading& reading, std::int64_t code, const std::string& path,
                                    std::string_view what) {
   if (!reading.error) reading.error = ChanmeterError{code};
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   if (complaints_.size() >= kMaxSubstreams || !complaints_.insert(path).second) return;
   errorLog(log_, "%s: %s (failure %lli; the channels concerned are left out)", path, what, code);
 }

@@ -4,7 +4,6 @@
 #include <cstddef>
 #include <map>
 #include <memory>
-#include <mutex>
 #include <optional>
 #include <set>
 #include <string>
@@ -12,6 +11,7 @@
 
 #include "platform/Log.h"
 #include "platform/linux/channels/ChannelChoice.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -65,9 +65,11 @@ class KernelSoundChannels {
   const std::string cards_;
   const std::string devices_;
   const LogCategory& log_;
-  std::mutex mutex_;                  // guards what follows
-  std::set<std::string> complaints_;  // the paths that were logged, at most kMaxSubstreams
-  std::map<ChanmeterKey, std::shared_ptr<const ChanmeterRecord>> latest_;  // at most kMaxKept
+  Mutex mutex_;
+  // The paths that were logged, at most kMaxSubstreams.
+  std::set<std::string> complaints_ GUARDED_BY(mutex_);
+  // At most kMaxKept.
+  std::map<ChanmeterKey, std::shared_ptr<const ChanmeterRecord>> latest_ GUARDED_BY(mutex_);
 };
 
 }  // namespace tonewerk

@@ -37,7 +37,7 @@ ChannelFileProblem pastBound(std::size_t bound, const char* what) {
 
 void PublishedChannels::read(const ChannelChoice& choice, ChanmeterRecords& records,
                              std::optional<ChanmeterError>& error) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   const std::vector<std::string> names = fileNames(error);
   forgetAllBut(names);
   Sums sums;

@@ -4,7 +4,6 @@
 #include <cstddef>
 #include <cstdint>
 #include <map>
-#include <mutex>
 #include <optional>
 #include <string>
 #include <vector>
@@ -13,6 +12,7 @@
 #include "platform/linux/channels/ChannelChoice.h"
 #include "platform/linux/channels/ChannelFile.h"
 #include "platform/linux/files/FileStamp.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -61,17 +61,17 @@ class PublishedChannels {
   };
 
   // Ascending.
-  std::vector<std::string> fileNames(std::optional<ChanmeterError>& error);
-  void forgetAllBut(const std::vector<std::string>& names);
+  std::vector<std::string> fileNames(std::optional<ChanmeterError>& error) REQUIRES(mutex_);
+  void forgetAllBut(const std::vector<std::string>& names) REQUIRES(mutex_);
   static ChannelFileProblem refresh(const std::string& path, File& file, Sums& sums);
   static void readAgain(const std::string& path, File& file);
   void complain(const std::string& path, const ChannelFileProblem& problem, std::string& logged) const;
 
   const std::string directory_;
   const LogCategory& log_;
-  std::mutex mutex_;                   // guards what follows
-  std::map<std::string, File> files_;  // by name
-  std::string loggedOfDirectory_;
+  Mutex mutex_;
+  std::map<std::string, File> files_ GUARDED_BY(mutex_);  // by name
+  std::string loggedOfDirectory_ GUARDED_BY(mutex_);
 };
 
 }  // namespace tonewerk

@@ -28,7 +28,7 @@ CaptureSessions::CaptureSessions(const Clock& clock, TimerService& timers, Captu
 CaptureSessions::~CaptureSessions() = default;
 
 CaptureSessions::Outcome CaptureSessions::snapshot(const CaptureRequest& request) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   if (isFinished_) return {kFaultsignErrorServiceUnavailable};
   if (const FaultsignError error = policy_.judge(request.signature, request.duration)) return {error};
   std::string identifier = identifiers_.next(clock_.now());
@@ -38,7 +38,7 @@ CaptureSessions::Outcome CaptureSessions::snapshot(const CaptureRequest& request
 }
 
 CaptureSessions::Outcome CaptureSessions::start(const CaptureRequest& request) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   if (isFinished_) return {kFaultsignErrorServiceUnavailable};
   if (const FaultsignError error = policy_.judge(request.signature, request.duration)) return {error};
   if (pending_.size() >= kMaxPending) return {kFaultsignErrorServiceUnavailable};
@@ -54,7 +54,7 @@ CaptureSessions::Outcome CaptureSessions::start(const CaptureRequest& request) {
 
 // Under the lock to its end: whoever cancels or finishes meanwhile learns whether the capture was made.
 void CaptureSessions::fire(const std::string& identifier) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   const auto due = pending_.find(identifier);
   if (due == pending_.end()) return;
   capture_(identifier, due->second.request);  // what finds no room is in its maker's log
@@ -62,7 +62,7 @@ void CaptureSessions::fire(const std::string& identifier) {
 }
 
 bool CaptureSessions::cancel(const std::string& identifier) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   const auto found = pending_.find(identifier);
   if (found == pending_.end()) return false;
   policy_.withdraw(found->second.request.signature, found->second.acceptance);
@@ -71,7 +71,7 @@ bool CaptureSessions::cancel(const std::string& identifier) {
 }
 
 std::vector<std::string> CaptureSessions::finish() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   isFinished_ = true;
   std::vector<std::string> dropped;
   for (const auto& entry : pending_) dropped.push_back(entry.first);
@@ -80,7 +80,7 @@ std::vector<std::string> CaptureSessions::finish() {
 }
 
 CapturePolicy::Count CaptureSessions::count() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return policy_.count();
 }
 

@@ -5,7 +5,6 @@
 #include <functional>
 #include <map>
 #include <memory>
-#include <mutex>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -14,6 +13,7 @@
 #include "platform/FaultsignReporter.h"
 #include "platform/linux/diagnostics/CapturePolicy.h"
 #include "platform/linux/files/Ulid.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -83,12 +83,13 @@ class CaptureSessions : public std::enable_shared_from_this<CaptureSessions> {
 
   const Clock& clock_;
   TimerService& timers_;
-  mutable std::mutex mutex_;  // guards all below
-  bool isFinished_ = false;
-  CapturePolicy policy_;
-  Capture capture_;
-  UlidGenerator identifiers_;
-  std::map<std::string, Pending, std::less<>> pending_;  // identifiers sort by time
+  mutable Mutex mutex_;
+  bool isFinished_ GUARDED_BY(mutex_) = false;
+  CapturePolicy policy_ GUARDED_BY(mutex_);
+  Capture capture_ GUARDED_BY(mutex_);
+  UlidGenerator identifiers_ GUARDED_BY(mutex_);
+  // Identifiers sort by time.
+  std::map<std::string, Pending, std::less<>> pending_ GUARDED_BY(mutex_);
 };
 
 }  // namespace tonewerk

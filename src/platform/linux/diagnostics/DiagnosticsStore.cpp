@@ -72,7 +72,7 @@ std::error_code DiagnosticsStore::add(DiagnosticItem item, Completion completion
   const std::size_t bytes = item.request.bytes();
   std::uint64_t refusedBefore = 0;
   {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     if (isEnding_) return std::make_error_code(std::errc::operation_canceled);
     const bool fits = pending_.size() < limits_.pendingItems &&
                       (pending_.empty() || pendingBytes_ + bytes <= limits_.pendingBytes);
@@ -86,7 +86,7 @@ std::error_code DiagnosticsStore::add(DiagnosticItem item, Completion completion
     pendingBytes_ += bytes;
     pending_.push_back({std::move(item), now, std::move(completion)});
   }
-  changed_.notify_all();
+  changed_.notifyAll();
   if (refusedBefore > 0)
     errorLog(log_, "diagnostics are taken again; refused meanwhile: %llu", refusedBefore);
   return {};
@@ -94,10 +94,12 @@ std::error_code DiagnosticsStore::add(DiagnosticItem item, Completion completion
 
 void DiagnosticsStore::finish(std::chrono::milliseconds timeout) {
   {
-    std::unique_lock lock(mutex_);
+    MutexLock lock(mutex_);
     isEnding_ = true;
-    changed_.notify_all();
-    changed_.wait_for(lock, timeout, [this] { return isIdle_ && pending_.empty(); });
+    changed_.notifyAll();
+    const auto deadline = std::chrono::steady_clock::now() + timeout;
+    while (!(isIdle_ && pending_.empty()) && changed_.waitUntil(lock, deadline)) {
+    }
   }
   runner_.interrupt();
   if (thread_.joinable()) thread_.join();
@@ -105,10 +107,10 @@ void DiagnosticsStore::finish(std::chrono::milliseconds timeout) {
 
 void DiagnosticsStore::removeLeftovers() {
   {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     sweepIsDue_ = true;
   }
-  changed_.notify_all();
+  changed_.notifyAll();
 }
 
 void DiagnosticsStore::run() {
@@ -119,11 +121,11 @@ void DiagnosticsStore::run() {
 
 // None when the store ends and nothing is left.
 std::optional<DiagnosticsStore::Pending> DiagnosticsStore::take() {
-  std::unique_lock lock(mutex_);
+  MutexLock lock(mutex_);
   for (;;) {
     isIdle_ = true;
-    changed_.notify_all();
-    changed_.wait(lock, [this] { return isEnding_ || sweepIsDue_ || !pending_.empty(); });
+    changed_.notifyAll();
+    while (!isEnding_ && !sweepIsDue_ && pending_.empty()) changed_.wait(lock);
     if (pending_.empty() && !sweepIsDue_) return std::nullopt;
     isIdle_ = false;
     if (std::exchange(sweepIsDue_, false)) {

@@ -2,13 +2,11 @@
 #pragma once
 
 #include <chrono>
-#include <condition_variable>
 #include <cstddef>
 #include <cstdint>
 #include <deque>
 #include <functional>
 #include <memory>
-#include <mutex>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -19,6 +17,7 @@
 #include "platform/linux/diagnostics/DiagnosticsDirectory.h"
 #include "platform/linux/diagnostics/collectors/CollectorRunner.h"
 #include "platform/linux/diagnostics/collectors/DiagnosticItem.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -113,14 +112,14 @@ class DiagnosticsStore {
   CollectorRunner runner_;
   std::string loggedWrongBounds_;  // the thread's own
 
-  std::mutex mutex_;  // guards the six below
-  std::condition_variable changed_;
-  std::deque<Pending> pending_;
-  std::size_t pendingBytes_ = 0;
-  std::uint64_t refused_ = 0;  // since the queue was last empty
-  bool isEnding_ = false;
-  bool isIdle_ = false;
-  bool sweepIsDue_ = false;
+  Mutex mutex_;
+  Condition changed_;
+  std::deque<Pending> pending_ GUARDED_BY(mutex_);
+  std::size_t pendingBytes_ GUARDED_BY(mutex_) = 0;
+  std::uint64_t refused_ GUARDED_BY(mutex_) = 0;  // since the queue was last empty
+  bool isEnding_ GUARDED_BY(mutex_) = false;
+  bool isIdle_ GUARDED_BY(mutex_) = false;
+  bool sweepIsDue_ GUARDED_BY(mutex_) = false;
 
   std::thread thread_;  // last: it uses all above
 };

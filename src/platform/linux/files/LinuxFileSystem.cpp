@@ -232,7 +232,7 @@ std::unique_ptr<NewFile> LinuxFileSystem::createFile(const std::string& director
 
 void LinuxFileSystem::removeLeftovers(const std::string& path, int directory) {
   {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     if (!swept_.insert(path).second) return;
   }
   std::error_code error;  // a directory that cannot be read keeps what it has

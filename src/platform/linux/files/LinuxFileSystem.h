@@ -1,11 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <mutex>
 #include <set>
 #include <string>
 
 #include "platform/FileSystem.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -33,8 +33,8 @@ class LinuxFileSystem final : public FileSystem {
   // Once a directory.
   void removeLeftovers(const std::string& path, int directory);
 
-  std::mutex mutex_;
-  std::set<std::string> swept_;  // guarded by mutex_; the directories, by path
+  Mutex mutex_;
+  std::set<std::string> swept_ GUARDED_BY(mutex_);  // the directories, by path
 };
 
 }  // namespace tonewerk

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/otlp/OtlpExporter.h"
 
+#include <algorithm>
 #include <utility>
 
 #include "platform/Clock.h"
@@ -37,39 +38,43 @@ void OtlpExporter::flush() {
 
 void OtlpExporter::beginEnd() {
   outbox_.flush();
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   isEnding_ = true;
-  changed_.notify_all();
+  changed_.notifyAll();
 }
 
 bool OtlpExporter::waitForEnd(std::chrono::steady_clock::time_point deadline) {
-  std::unique_lock lock(mutex_);
-  return changed_.wait_until(lock, deadline, [this] { return hasEnded_; });
+  MutexLock lock(mutex_);
+  while (!hasEnded_ && changed_.waitUntil(lock, deadline)) {
+  }
+  return hasEnded_;
 }
 
 void OtlpExporter::wake() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   hasNews_ = true;
-  changed_.notify_all();
+  changed_.notifyAll();
 }
 
 void OtlpExporter::run() {
   nameThisThread("tw-otlp");
   constexpr OtlpOutbox::Time kLongest = std::chrono::hours(1);
-  std::unique_lock lock(mutex_);
+  MutexLock lock(mutex_);
   while (!isEnding_) {
     hasNews_ = false;
     lock.unlock();
     const OtlpOutbox::Time wait = std::min(sender_.sendDue().value_or(kLongest), kLongest);
     lock.lock();
-    changed_.wait_for(lock, wait, [this] { return hasNews_ || isEnding_; });
+    const auto until = std::chrono::steady_clock::now() + wait;
+    while (!hasNews_ && !isEnding_ && changed_.waitUntil(lock, until)) {
+    }
   }
   lock.unlock();
   sender_.hurry();
   sender_.sendDue();
   lock.lock();
   hasEnded_ = true;
-  changed_.notify_all();
+  changed_.notifyAll();
 }
 
 }  // namespace tonewerk

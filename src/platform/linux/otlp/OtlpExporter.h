@@ -2,9 +2,7 @@
 #pragma once
 
 #include <chrono>
-#include <condition_variable>
 #include <memory>
-#include <mutex>
 #include <string>
 #include <thread>
 
@@ -12,6 +10,7 @@
 #include "platform/linux/otlp/OtlpOutbox.h"
 #include "platform/linux/otlp/OtlpSender.h"
 #include "platform/linux/otlp/RetryPolicy.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -52,12 +51,11 @@ class OtlpExporter {
   OtlpOutbox outbox_;
   OtlpSender sender_;  // the thread's own
 
-  std::mutex mutex_;
-  std::condition_variable changed_;
-  // Guarded by mutex_.
-  bool hasNews_ = false;
-  bool isEnding_ = false;
-  bool hasEnded_ = false;
+  Mutex mutex_;
+  Condition changed_;
+  bool hasNews_ GUARDED_BY(mutex_) = false;
+  bool isEnding_ GUARDED_BY(mutex_) = false;
+  bool hasEnded_ GUARDED_BY(mutex_) = false;
 
   std::thread thread_;  // last: it uses all above
 };

@@ -15,7 +15,7 @@ std::size_t bytesOf(const std::string& record) { return record.size() + kRecordB
 }  // namespace
 
 OtlpOutbox::Added OtlpOutbox::add(std::string record, Urgency urgency, Time now) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   const std::size_t bytes = bytesOf(record);
   if (bytes_ + bytes > limits_.bytes) {
     ++dropped_;
@@ -32,13 +32,13 @@ OtlpOutbox::Added OtlpOutbox::add(std::string record, Urgency urgency, Time now)
 }
 
 bool OtlpOutbox::flush() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   flushed_ = batched_.size();
   return flushed_ > 0;
 }
 
 std::optional<OtlpOutbox::Time> OtlpOutbox::nextDue() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   if (!atOnce_.empty()) return atOnce_.front().addedAt;
   return batchedDue();
 }
@@ -51,7 +51,7 @@ std::optional<OtlpOutbox::Time> OtlpOutbox::batchedDue() const {
 }
 
 OtlpOutbox::Batch OtlpOutbox::take(Time now) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   if (!atOnce_.empty()) return takeFrom(atOnce_);
   const std::optional<Time> due = batchedDue();
   if (!due || *due > now) return {};
@@ -73,18 +73,18 @@ OtlpOutbox::Batch OtlpOutbox::takeFrom(std::deque<Waiting>& waiting) {
 }
 
 void OtlpOutbox::settle(const Batch& batch) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   bytes_ -= batch.bytes;
   count_ -= batch.records.size();
 }
 
 std::uint64_t OtlpOutbox::takeDropped() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return std::exchange(dropped_, 0);
 }
 
 std::size_t OtlpOutbox::count() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return count_;
 }
 

@@ -5,10 +5,11 @@
 #include <cstddef>
 #include <cstdint>
 #include <deque>
-#include <mutex>
 #include <optional>
 #include <string>
 #include <vector>
+
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -63,18 +64,17 @@ class OtlpOutbox {
     Time addedAt;
   };
 
-  // Guarded by mutex_, which whoever calls these holds.
-  std::optional<Time> batchedDue() const;
-  Batch takeFrom(std::deque<Waiting>& waiting);
+  std::optional<Time> batchedDue() const REQUIRES(mutex_);
+  Batch takeFrom(std::deque<Waiting>& waiting) REQUIRES(mutex_);
 
   const Limits limits_;
-  mutable std::mutex mutex_;  // guards all below
-  std::deque<Waiting> atOnce_;
-  std::deque<Waiting> batched_;
-  std::size_t flushed_ = 0;  // of batched_, the first so many are due
-  std::size_t bytes_ = 0;
-  std::size_t count_ = 0;
-  std::uint64_t dropped_ = 0;
+  mutable Mutex mutex_;
+  std::deque<Waiting> atOnce_ GUARDED_BY(mutex_);
+  std::deque<Waiting> batched_ GUARDED_BY(mutex_);
+  std::size_t flushed_ GUARDED_BY(mutex_) = 0;  // of batched_, the first so many are due
+  std::size_t bytes_ GUARDED_BY(mutex_) = 0;
+  std::size_t count_ GUARDED_BY(mutex_) = 0;
+  std::uint64_t dropped_ GUARDED_BY(mutex_) = 0;
 };
 
 }  // namespace tonewerk

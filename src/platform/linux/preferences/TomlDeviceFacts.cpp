@@ -10,14 +10,14 @@ TomlDeviceFacts::TomlDeviceFacts(std::string path, const LogCategory& log) : fil
 }
 
 std::optional<bool> TomlDeviceFacts::boolean(std::string_view property) const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   const Value* value = file_.values().find(property);
   if (value == nullptr || value->asBoolean() == nullptr) return std::nullopt;
   return *value->asBoolean();
 }
 
 void TomlDeviceFacts::readAgain() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   file_.refresh();
 }
 

@@ -1,12 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <mutex>
 #include <string>
 
 #include "platform/DeviceFacts.h"
 #include "platform/Log.h"
 #include "platform/linux/preferences/TomlFile.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -22,8 +22,8 @@ class TomlDeviceFacts final : public DeviceFacts {
   void readAgain();
 
  private:
-  mutable std::mutex mutex_;  // guards the file
-  TomlFile file_;
+  mutable Mutex mutex_;
+  TomlFile file_ GUARDED_BY(mutex_);
 };
 
 }  // namespace tonewerk

@@ -97,7 +97,7 @@ TomlPreferenceStore::TomlPreferenceStore(std::string configurationDirectory, std
 
 TomlPreferenceStore::Contents TomlPreferenceStore::contentsOf(std::string_view domain) const {
   if (!isDomain(domain)) return {};
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   auto found = domains_.find(domain);
   if (found == domains_.end()) {
     const std::string file = "/" + fileNameOf(domain);

@@ -3,11 +3,11 @@
 
 #include <functional>
 #include <map>
-#include <mutex>
 #include <string>
 
 #include "platform/PreferenceStore.h"
 #include "platform/linux/preferences/TomlFile.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -71,8 +71,8 @@ class TomlPreferenceStore final : public PreferenceStore {
   const std::string configurationDirectory_;
   const std::string stateDirectory_;
   const LogCategory& log_;
-  mutable std::mutex mutex_;  // guards the domains; not held while a writer waits for the disk
-  mutable std::map<std::string, Domain, std::less<>> domains_;
+  mutable Mutex mutex_;  // not held while a writer waits for the disk
+  mutable std::map<std::string, Domain, std::less<>> domains_ GUARDED_BY(mutex_);
 };
 
 }  // namespace tonewerk

@@ -36,7 +36,7 @@ bool LinuxSystemInformation::isLowPowerModeEnabled() const {
 
 LinuxSystemInformation::Reading LinuxSystemInformation::reading() const {
   const std::chrono::nanoseconds now = clock_.monotonic();
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   if (!reading_ || now - reading_->at > kMaxAge) {
     reading_ = Reading{now, thermalLevelOf(sysDirectory_ + "/class/thermal"),
                        isLowProfile(sysDirectory_ + "/firmware/acpi")};

@@ -3,13 +3,13 @@
 
 #include <atomic>
 #include <chrono>
-#include <mutex>
 #include <optional>
 #include <string>
 
 #include "platform/Clock.h"
 #include "platform/SystemInformation.h"
 #include "platform/linux/system/PowerProfileWatcher.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -48,8 +48,8 @@ class LinuxSystemInformation final : public SystemInformation {
 
   const Clock& clock_;
   const std::string sysDirectory_;
-  mutable std::mutex mutex_;
-  mutable std::optional<Reading> reading_;  // guarded by mutex_
+  mutable Mutex mutex_;
+  mutable std::optional<Reading> reading_ GUARDED_BY(mutex_);
   std::atomic<bool> isPowerSaver_{false};
   PowerProfileWatcher watcher_;  // last: it writes isPowerSaver_
 };

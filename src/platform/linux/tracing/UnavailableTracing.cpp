@@ -1,8 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/tracing/UnavailableTracing.h"
 
-#include <mutex>
 #include <utility>
+
+#include "values/Mutex.h"
 
 namespace tonewerk {
 namespace {
@@ -12,13 +13,13 @@ class UnavailableSession final : public RuntraceSession {
   explicit UnavailableSession(std::string reason) : reason_(std::move(reason)) {}
 
   void setDelegate(std::weak_ptr<RuntraceSessionDelegate> delegate) override {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     delegate_ = std::move(delegate);
   }
   void startRuntrace() override {
     std::shared_ptr<RuntraceSessionDelegate> delegate;
     {
-      const std::lock_guard lock(mutex_);
+      const MutexLock lock(mutex_);
       delegate = delegate_.lock();
     }
     if (delegate != nullptr) delegate->runtraceDidStart(reason_);
@@ -28,8 +29,8 @@ class UnavailableSession final : public RuntraceSession {
 
  private:
   const std::string reason_;
-  std::mutex mutex_;
-  std::weak_ptr<RuntraceSessionDelegate> delegate_;  // guarded by mutex_
+  Mutex mutex_;
+  std::weak_ptr<RuntraceSessionDelegate> delegate_ GUARDED_BY(mutex_);
 };
 
 }  // namespace

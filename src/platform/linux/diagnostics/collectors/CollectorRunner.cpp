@@ -1,14 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/diagnostics/collectors/CollectorRunner.h"
 
-#include <condition_variable>
-#include <mutex>
 #include <optional>
 #include <system_error>
 #include <thread>
 #include <utility>
 
 #include "platform/linux/threads/ThreadProperties.h"
+#include "values/Mutex.h"
 #include "values/ShortenedText.h"
 #include "values/Utf8.h"
 
@@ -16,30 +15,33 @@ namespace tonewerk {
 
 // Outlives the runner when a collector hangs.
 struct CollectorRunner::Shared {
-  std::mutex mutex;  // guards the flag and every slot's fields
-  std::condition_variable changed;
-  bool isInterrupted = false;
-};
+  // What one collector is doing.
+  struct Progress {
+    bool isBusy = false;
+    std::optional<DiagnosticCollector::Result> result;
+  };
 
-struct CollectorRunner::Slot {
-  std::shared_ptr<DiagnosticCollector> collector;
-  bool isBusy = false;
-  std::optional<DiagnosticCollector::Result> result = {};
+  explicit Shared(std::size_t collectors) : progress(collectors) {}
+
+  Mutex mutex;
+  Condition changed;
+  bool isInterrupted GUARDED_BY(mutex) = false;
+  std::vector<Progress> progress GUARDED_BY(mutex);  // in the order of the collectors
 };
 
 CollectorRunner::CollectorRunner(std::vector<std::shared_ptr<DiagnosticCollector>> collectors,
                                  const Limits& limits)
-    : limits_(limits), shared_(std::make_shared<Shared>()) {
-  for (auto& collector : collectors) slots_.push_back(std::make_shared<Slot>(Slot{std::move(collector)}));
-}
+    : limits_(limits),
+      collectors_(std::move(collectors)),
+      shared_(std::make_shared<Shared>(collectors_.size())) {}
 
 CollectorRunner::~CollectorRunner() = default;
 
 DiagnosticEvidence CollectorRunner::run() {
   DiagnosticEvidence evidence;
-  for (const std::shared_ptr<Slot>& slot : slots_) {
-    const std::string name(slot->collector->fileName());
-    DiagnosticCollector::Result result = runOne(slot);
+  for (std::size_t index = 0; index < collectors_.size(); ++index) {
+    const std::string name(collectors_[index]->fileName());
+    DiagnosticCollector::Result result = runOne(index);
     // Whatever processes, cards and nodes call themselves: who reads evidence may count on text.
     result.text = validUtf8(std::move(result.text));
     result.problem = validUtf8(std::move(result.problem));
@@ -54,46 +56,46 @@ DiagnosticEvidence CollectorRunner::run() {
 }
 
 void CollectorRunner::interrupt() {
-  const std::lock_guard lock(shared_->mutex);
+  const MutexLock lock(shared_->mutex);
   shared_->isInterrupted = true;
-  shared_->changed.notify_all();
+  shared_->changed.notifyAll();
 }
 
-DiagnosticCollector::Result CollectorRunner::runOne(const std::shared_ptr<Slot>& slot) {
+DiagnosticCollector::Result CollectorRunner::runOne(std::size_t index) {
   {
-    const std::lock_guard lock(shared_->mutex);
+    const MutexLock lock(shared_->mutex);
     if (shared_->isInterrupted) return {{}, "the daemon was ending"};
-    if (slot->isBusy) return {{}, "still busy with an earlier item"};
-    slot->isBusy = true;
-    slot->result.reset();
+    Shared::Progress& progress = shared_->progress[index];
+    if (progress.isBusy) return {{}, "still busy with an earlier item"};
+    progress = {.isBusy = true, .result = std::nullopt};
   }
   try {
-    std::thread([slot, shared = shared_] {
+    std::thread([collector = collectors_[index], shared = shared_, index] {
       nameThisThread("tw-collector");
-      DiagnosticCollector::Result result = slot->collector->collect();
-      const std::lock_guard lock(shared->mutex);
-      slot->result = std::move(result);
-      slot->isBusy = false;
-      shared->changed.notify_all();
+      DiagnosticCollector::Result result = collector->collect();
+      const MutexLock lock(shared->mutex);
+      shared->progress[index] = {.isBusy = false, .result = std::move(result)};
+      shared->changed.notifyAll();
     }).detach();
   } catch (const std::system_error& error) {
-    const std::lock_guard lock(shared_->mutex);
-    slot->isBusy = false;
+    const MutexLock lock(shared_->mutex);
+    shared_->progress[index].isBusy = false;
     return {{}, std::string("no thread: ") + error.what()};
   }
-  return await(*slot);
+  return await(index);
 }
 
-DiagnosticCollector::Result CollectorRunner::await(Slot& slot) {
+DiagnosticCollector::Result CollectorRunner::await(std::size_t index) {
   const auto deadline = std::chrono::steady_clock::now() + limits_.time;
-  std::unique_lock lock(shared_->mutex);
-  while (!slot.result) {
+  MutexLock lock(shared_->mutex);
+  std::optional<DiagnosticCollector::Result>& result = shared_->progress[index].result;
+  while (!result) {
     if (shared_->isInterrupted) return {{}, "the daemon was ending"};
-    if (shared_->changed.wait_until(lock, deadline) == std::cv_status::timeout && !slot.result) {
+    if (!shared_->changed.waitUntil(lock, deadline) && !result) {
       return {{}, "timed out after " + std::to_string(limits_.time.count()) + " ms"};
     }
   }
-  return *std::exchange(slot.result, std::nullopt);
+  return *std::exchange(result, std::nullopt);
 }
 
 }  // namespace tonewerk

@@ -34,14 +34,13 @@ class CollectorRunner {
 
  private:
   struct Shared;
-  struct Slot;
 
-  DiagnosticCollector::Result runOne(const std::shared_ptr<Slot>& slot);
-  DiagnosticCollector::Result await(Slot& slot);
+  DiagnosticCollector::Result runOne(std::size_t index);
+  DiagnosticCollector::Result await(std::size_t index);
 
   const Limits limits_;
-  const std::shared_ptr<Shared> shared_;
-  std::vector<std::shared_ptr<Slot>> slots_;
+  const std::vector<std::shared_ptr<DiagnosticCollector>> collectors_;
+  const std::shared_ptr<Shared> shared_;  // used by the collectors' threads, which may outlive this
 };
 
 }  // namespace tonewerk

@@ -25,33 +25,36 @@ AbandonableThread::~AbandonableThread() {
 }
 
 void AbandonableThread::Queue::post(Task work) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   if (hasEnded_) return;
   pieces_.push_back(std::move(work));
-  changed_.notify_all();
+  changed_.notifyAll();
 }
 
 std::chrono::milliseconds AbandonableThread::Queue::busyFor() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   if (!busySince_) return std::chrono::milliseconds(0);
   return std::chrono::duration_cast<std::chrono::milliseconds>(Clock::now() - *busySince_);
 }
 
 void AbandonableThread::Queue::end() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   isEnding_ = true;
-  changed_.notify_all();
+  changed_.notifyAll();
 }
 
 bool AbandonableThread::Queue::waitForEnd(std::chrono::milliseconds patience) {
-  std::unique_lock lock(mutex_);
-  return changed_.wait_for(lock, patience, [this] { return hasEnded_; });
+  MutexLock lock(mutex_);
+  const Clock::time_point deadline = Clock::now() + patience;
+  while (!hasEnded_ && changed_.waitUntil(lock, deadline)) {
+  }
+  return hasEnded_;
 }
 
 void AbandonableThread::Queue::run() {
-  std::unique_lock lock(mutex_);
+  MutexLock lock(mutex_);
   for (;;) {
-    changed_.wait(lock, [this] { return isEnding_ || !pieces_.empty(); });
+    while (!isEnding_ && pieces_.empty()) changed_.wait(lock);
     if (pieces_.empty()) break;
     Task work = std::move(pieces_.front());
     pieces_.pop_front();
@@ -63,7 +66,7 @@ void AbandonableThread::Queue::run() {
     busySince_.reset();
   }
   hasEnded_ = true;
-  changed_.notify_all();
+  changed_.notifyAll();
 }
 
 }  // namespace tonewerk

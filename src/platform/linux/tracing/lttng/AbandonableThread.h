@@ -2,13 +2,12 @@
 #pragma once
 
 #include <chrono>
-#include <condition_variable>
 #include <deque>
 #include <memory>
-#include <mutex>
 #include <optional>
 #include <thread>
 
+#include "values/Mutex.h"
 #include "values/UniqueFunction.h"
 
 namespace tonewerk {
@@ -34,12 +33,13 @@ class AbandonableThread {
     void end();
     bool waitForEnd(std::chrono::milliseconds patience);
 
-    mutable std::mutex mutex_;  // guards all below
-    std::condition_variable changed_;
-    std::deque<Task> pieces_;
-    std::optional<std::chrono::steady_clock::time_point> busySince_;  // none while no piece runs
-    bool isEnding_ = false;
-    bool hasEnded_ = false;
+    mutable Mutex mutex_;
+    Condition changed_;
+    std::deque<Task> pieces_ GUARDED_BY(mutex_);
+    // None while no piece runs.
+    std::optional<std::chrono::steady_clock::time_point> busySince_ GUARDED_BY(mutex_);
+    bool isEnding_ GUARDED_BY(mutex_) = false;
+    bool hasEnded_ GUARDED_BY(mutex_) = false;
   };
 
   // `patience`: how long the destructor waits.

@@ -4,7 +4,6 @@
 #include <atomic>
 #include <cerrno>
 #include <cstdlib>
-#include <mutex>
 #include <optional>
 #include <system_error>
 #include <unistd.h>
@@ -18,6 +17,7 @@
 #include "platform/linux/tracing/lttng/SessionDaemon.h"
 #include "platform/linux/tracing/lttng/TraceDirectory.h"
 #include "tonewerk/signpost.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 namespace {
@@ -48,13 +48,13 @@ class LttngRuntrace::Course {
   explicit Course(RuntraceConfiguration wanted) : configuration(std::move(wanted)) {}
 
   void setDelegate(std::weak_ptr<RuntraceSessionDelegate> delegate) {
-    const std::lock_guard lock(mutex_);
+    const RecursiveMutexLock lock(mutex_);
     delegate_ = std::move(delegate);
   }
   // Under the lock, so that setDelegate() waits for it; it may come from inside.
   template <typename Call>
   void tell(Call call) {
-    const std::lock_guard lock(mutex_);
+    const RecursiveMutexLock lock(mutex_);
     if (const auto delegate = delegate_.lock()) call(*delegate);
   }
 
@@ -66,8 +66,8 @@ class LttngRuntrace::Course {
   std::shared_ptr<TraceDirectory> directory;
 
  private:
-  std::recursive_mutex mutex_;
-  std::weak_ptr<RuntraceSessionDelegate> delegate_;  // guarded by mutex_
+  RecursiveMutex mutex_;
+  std::weak_ptr<RuntraceSessionDelegate> delegate_ GUARDED_BY(mutex_);
 };
 
 // What happens on the control thread.

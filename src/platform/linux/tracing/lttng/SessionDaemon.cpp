@@ -92,7 +92,7 @@ SessionDaemon::SessionDaemon(std::string logPath, const LogCategory& log)
 SessionDaemon::~SessionDaemon() { end(); }
 
 bool SessionDaemon::isPrivate() const {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return process_ != 0;
 }
 
@@ -120,7 +120,7 @@ std::string SessionDaemon::startPrivate() {
   if (process == 0) becomeSessionDaemon(logFile.get(), report.get(), environment.get());
   if (process < 0) return "no process for " + std::string(kProgram) + ": " + systemText(errno);
   {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     process_ = process;
   }
   report.reset();
@@ -146,21 +146,21 @@ std::string SessionDaemon::waitUntilItAnswers() {
 }
 
 bool SessionDaemon::hasEnded() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   return process_ == 0 || endsWithin(process_, milliseconds(0));
 }
 
 void SessionDaemon::end() {
   pid_t process = 0;
   {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     process = process_;
   }
   if (process == 0) return;
   ::kill(process, SIGTERM);
   if (!endsWithin(process, kEndTimeout)) kill();
   // Only here, under the lock, so that kill() never meets another process under this number.
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   int status = 0;
   while (::waitpid(process, &status, 0) < 0 && errno == EINTR) {
   }
@@ -168,7 +168,7 @@ void SessionDaemon::end() {
 }
 
 void SessionDaemon::kill() {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   if (process_ != 0) ::kill(process_, SIGKILL);
 }
 

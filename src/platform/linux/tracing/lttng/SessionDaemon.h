@@ -1,9 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <mutex>
 #include <string>
 #include <sys/types.h>
+
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -41,8 +42,8 @@ class SessionDaemon {
 
   const std::string logPath_;
   const LogCategory& log_;
-  mutable std::mutex mutex_;
-  pid_t process_ = 0;  // the private one, not yet reaped; 0 for none; guarded by mutex_
+  mutable Mutex mutex_;
+  pid_t process_ GUARDED_BY(mutex_) = 0;  // the private one, not yet reaped; 0 for none
 };
 
 }  // namespace tonewerk
