@@ -22,13 +22,13 @@ class ProcReader {
 
   // Processes in order of their numbers. None, and why in `problem`, when there is no such directory or it
   // does not say how much memory there is. A process that ends meanwhile is left out.
-  std::optional<UsageSnapshot> read(std::string& problem) const;
+  [[nodiscard]] std::optional<UsageSnapshot> read(std::string& problem) const;
 
  private:
   enum class Outcome { kRead, kGone, kWithoutMemory, kUnreadable };
   static Outcome outcomeOf(const std::error_code& error);
-  Outcome readProcess(std::int32_t identifier, ProcessUsage& process) const;
-  bool readSystem(MemoryUsage& system) const;
+  [[nodiscard]] Outcome readProcess(std::int32_t identifier, ProcessUsage& process) const;
+  [[nodiscard]] bool readSystem(MemoryUsage& system) const;
   void readProcessorTime(MemoryUsage& system) const;
 
   const std::string root_;

@@ -14,6 +14,7 @@ namespace tonewerk {
 //
 // A damaged trace may keep the underlying library busy for ever or make it end the process: whoever calls
 // this is ready for both.
-std::string readCtfTrace(const std::string& directory, const std::function<bool(const SignpostEvent&)>& take);
+[[nodiscard]] std::string readCtfTrace(const std::string& directory,
+                                       const std::function<bool(const SignpostEvent&)>& take);
 
 }  // namespace tonewerk

@@ -25,7 +25,7 @@ struct ChannelFile {
 
   // None when one thing in `text` is not as it must be; then `problem` is the first. Fields that have no
   // meaning are left alone; of a field given twice the last counts.
-  static std::optional<ChannelFile> parse(std::string_view text, ChannelFileProblem& problem);
+  [[nodiscard]] static std::optional<ChannelFile> parse(std::string_view text, ChannelFileProblem& problem);
 };
 
 }  // namespace tonewerk

@@ -24,14 +24,14 @@ class LinuxChanmeter final : public RecordChanmeter {
   LinuxChanmeter(std::string channelsDirectory, const LogCategory& log, const std::string& root = {})
       : kernel_(root, log), published_(std::move(channelsDirectory), log) {}
 
-  Channels copyChannelsInGroup(const std::optional<std::string>& group,
-                               const std::optional<std::string>& subGroup,
-                               std::optional<ChanmeterError>& error) override;
+  [[nodiscard]] Channels copyChannelsInGroup(const std::optional<std::string>& group,
+                                             const std::optional<std::string>& subGroup,
+                                             std::optional<ChanmeterError>& error) override;
   // All channels can be subscribed.
-  Subscription createSubscription(const Channels& channels, Channels& subscribed,
-                                  std::optional<ChanmeterError>& error) override;
-  Samples createSamples(const Subscription& subscription, const Channels& subscribed,
-                        std::optional<ChanmeterError>& error) override;
+  [[nodiscard]] Subscription createSubscription(const Channels& channels, Channels& subscribed,
+                                                std::optional<ChanmeterError>& error) override;
+  [[nodiscard]] Samples createSamples(const Subscription& subscription, const Channels& subscribed,
+                                      std::optional<ChanmeterError>& error) override;
 
  private:
   ChanmeterRecords read(const ChannelChoice& choice, std::optional<ChanmeterError>& failure);

@@ -20,7 +20,7 @@ struct PcmStatus {
   //
   // How long the state lasts is the time stamp's distance from the last trigger. Most programs let the kernel
   // take time stamps; where none does, a running substream's position at its rate says as much.
-  static std::optional<PcmStatus> parse(std::string_view status, std::string_view parameters);
+  [[nodiscard]] static std::optional<PcmStatus> parse(std::string_view status, std::string_view parameters);
 };
 
 }  // namespace tonewerk

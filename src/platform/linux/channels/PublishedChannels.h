@@ -63,7 +63,7 @@ class PublishedChannels {
   // Ascending.
   std::vector<std::string> fileNames(std::optional<ChanmeterError>& error) REQUIRES(mutex_);
   void forgetAllBut(const std::vector<std::string>& names) REQUIRES(mutex_);
-  static ChannelFileProblem refresh(const std::string& path, File& file, Sums& sums);
+  [[nodiscard]] static ChannelFileProblem refresh(const std::string& path, File& file, Sums& sums);
   static void readAgain(const std::string& path, File& file);
   void complain(const std::string& path, const ChannelFileProblem& problem, std::string& logged) const;
 

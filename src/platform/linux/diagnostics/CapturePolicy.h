@@ -41,7 +41,7 @@ class CapturePolicy {
   //   InvalidParameters    the duration is negative, too long or NaN; domain, type or subtype is empty
   //   DailyLimitExceeded   by the wall clock: another day begins anew, also one that a clock went back to
   //   RequestThrottled     by the monotonic clock
-  FaultsignError judge(const FaultsignSignature& signature, double duration);
+  [[nodiscard]] FaultsignError judge(const FaultsignSignature& signature, double duration);
 
   // When it was, by the monotonic clock.
   using Acceptance = std::chrono::nanoseconds;

@@ -59,11 +59,11 @@ class CaptureSessions : public std::enable_shared_from_this<CaptureSessions> {
 
   // Besides what the policy refuses: kFaultsignErrorServiceUnavailable without room for the capture or for
   // one more that is pending, and after finish(). Those do not count.
-  Outcome snapshot(const CaptureRequest& request);
-  Outcome start(const CaptureRequest& request);
+  [[nodiscard]] Outcome snapshot(const CaptureRequest& request);
+  [[nodiscard]] Outcome start(const CaptureRequest& request);
 
   // False when no such session is pending: it never was, or its capture was made or cancelled already.
-  bool cancel(const std::string& identifier);
+  [[nodiscard]] bool cancel(const std::string& identifier);
 
   // Drops what is pending and takes no more. The identifiers that were dropped, in the order of their start;
   // of a capture that is becoming due at the same time either it was made when this returns, or never will

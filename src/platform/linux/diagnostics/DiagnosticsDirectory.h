@@ -60,8 +60,8 @@ class DiagnosticsDirectory {
   // The item's files by name.
   std::vector<FileEntry> filesOf(DiagnosticKind kind, std::string_view name) const;
   // None for a name that is not plain, or a file that cannot be read.
-  std::optional<std::string> readFile(DiagnosticKind kind, std::string_view item,
-                                      std::string_view file) const;
+  [[nodiscard]] std::optional<std::string> readFile(DiagnosticKind kind, std::string_view item,
+                                                    std::string_view file) const;
 
   // On the disk when it returns without an error; nothing is left of what failed. std::errc::invalid_argument
   // for names that are not plain, std::errc::file_exists for one that is taken.

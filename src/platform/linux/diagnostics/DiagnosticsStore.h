@@ -92,13 +92,14 @@ class DiagnosticsStore {
   };
 
   void run();
-  std::optional<Pending> take();
+  [[nodiscard]] std::optional<Pending> take();
   void process(const Pending& pending);
-  std::error_code writeItem(const DiagnosticItem& item, const std::string& name, double requestedAt);
+  [[nodiscard]] std::error_code writeItem(const DiagnosticItem& item, const std::string& name,
+                                          double requestedAt);
   std::string requestText(const DiagnosticItem& item, double requestedAt,
                           const DiagnosticEvidence& evidence) const;
   std::string nameOf(const DiagnosticItem& item, double requestedAt) const;
-  std::error_code makeRoom(std::uint64_t bytes);
+  [[nodiscard]] std::error_code makeRoom(std::uint64_t bytes);
   Bounds readBounds();
   double bound(std::string_view key, double otherwise, std::string& wrong) const;
   void sweep();

@@ -87,16 +87,17 @@ class LinuxCapsa::Reporter final : public FaultsignReporter {
             std::move(detectedProcess), std::move(triggerThresholdValues)};
   }
 
-  bool snapshotWithSignature(const FaultsignSignature& signature, double duration,
-                             const std::optional<ValueMap>& /*event*/, const std::optional<ValueMap>& payload,
-                             Reply reply) override {
+  [[nodiscard]] bool snapshotWithSignature(const FaultsignSignature& signature, double duration,
+                                           const std::optional<ValueMap>& /*event*/,
+                                           const std::optional<ValueMap>& payload, Reply reply) override {
     return answer(ask(&CaptureSessions::snapshot, {signature, duration, payload}), reply);
   }
 
-  bool startSessionWithSignature(const FaultsignSignature& signature, double duration,
-                                 const std::optional<ValueMap>& /*events*/,
-                                 const std::optional<ValueMap>& payload,
-                                 const std::optional<ValueMap>& /*actions*/, Reply reply) override {
+  [[nodiscard]] bool startSessionWithSignature(const FaultsignSignature& signature, double duration,
+                                               const std::optional<ValueMap>& /*events*/,
+                                               const std::optional<ValueMap>& payload,
+                                               const std::optional<ValueMap>& /*actions*/,
+                                               Reply reply) override {
     return answer(ask(&CaptureSessions::start, {signature, duration, payload}), reply);
   }
 
@@ -113,7 +114,7 @@ class LinuxCapsa::Reporter final : public FaultsignReporter {
  private:
   using Operation = CaptureSessions::Outcome (CaptureSessions::*)(const CaptureRequest&);
 
-  CaptureSessions::Outcome ask(Operation operation, const CaptureRequest& request) {
+  [[nodiscard]] CaptureSessions::Outcome ask(Operation operation, const CaptureRequest& request) {
     const auto service = service_.lock();
     if (service == nullptr) return {kFaultsignErrorServiceUnavailable};
     CaptureSessions::Outcome outcome = ((*service->sessions).*operation)(request);

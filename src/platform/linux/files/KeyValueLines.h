@@ -18,7 +18,7 @@ class KeyValueLines {
 
   // What comes behind the name and white space, up to the line's end; none without such a line: not every
   // kernel has every line. The first of several.
-  std::optional<std::string_view> find(std::string_view name) const {
+  [[nodiscard]] std::optional<std::string_view> find(std::string_view name) const {
     for (std::string_view rest = text_; !rest.empty();) {
       std::string_view line = rest.substr(0, rest.find('\n'));
       rest.remove_prefix(std::min(line.size() + 1, rest.size()));
@@ -31,7 +31,7 @@ class KeyValueLines {
   }
 
   // The number that the line's value begins with; none without one.
-  std::optional<std::uint64_t> number(std::string_view name) const {
+  [[nodiscard]] std::optional<std::uint64_t> number(std::string_view name) const {
     const std::string_view value = find(name).value_or(std::string_view());
     std::uint64_t number = 0;
     const auto parsed = std::from_chars(value.data(), value.data() + value.size(), number);

@@ -82,13 +82,13 @@ class HiddenFile final : public NewFile {
   HiddenFile& operator=(const HiddenFile&) = delete;
   ~HiddenFile() override { remove(); }
 
-  std::error_code write(std::string_view text) override {
+  [[nodiscard]] std::error_code write(std::string_view text) override {
     const std::error_code error = writeAll(file_.get(), text);
     if (error && !failure_) failure_ = error;
     return error;
   }
 
-  std::error_code place(const std::string& name) override {
+  [[nodiscard]] std::error_code place(const std::string& name) override {
     if (!isPlainName(name)) return std::make_error_code(std::errc::invalid_argument);
     if (failure_) return failure_;
     // Else a crash of the system could leave the name with half of the text, or none, behind it.
@@ -106,7 +106,7 @@ class HiddenFile final : public NewFile {
 
   // Another process that looks for leftovers may come between the making and the locking; then another file
   // is made. Who comes each time does not look for leftovers.
-  std::error_code open() {
+  [[nodiscard]] std::error_code open() {
     for (int attempt = 0; attempt < kMaxAttempts; ++attempt) {
       const std::error_code error = create();
       if (error && error != std::errc::file_exists) return error;
@@ -117,7 +117,7 @@ class HiddenFile final : public NewFile {
   }
 
   // Under a new name.
-  std::error_code create() {
+  [[nodiscard]] std::error_code create() {
     std::string name = newHiddenName();
     constexpr int kFlags = O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
     file_ = FileDescriptor(openat(directory_.get(), name.c_str(), kFlags, kFileMode));
@@ -131,13 +131,13 @@ class HiddenFile final : public NewFile {
   // Some file systems lock nothing (shares in a network, those in user space). The file is written there all
   // the same: who cannot lock takes nothing for a leftover either. Only where the system is out of locks for
   // a moment may another process take it for one; then place() fails.
-  bool lock() {
+  [[nodiscard]] bool lock() {
     if (flock(file_.get(), LOCK_EX | LOCK_NB) != 0) return errno != EWOULDBLOCK;
     struct stat status {};
     return fstat(file_.get(), &status) != 0 || status.st_nlink > 0;
   }
 
-  std::error_code moveByLink(const std::string& name) {
+  [[nodiscard]] std::error_code moveByLink(const std::string& name) {
     if (linkat(directory_.get(), hiddenName_.c_str(), directory_.get(), name.c_str(), 0) != 0)
       return lastSystemError();
     remove();

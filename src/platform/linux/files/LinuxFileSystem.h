@@ -19,15 +19,15 @@ namespace tonewerk {
 class LinuxFileSystem final : public FileSystem {
  public:
   // What root makes belongs to whom the directory around it belongs to.
-  std::error_code createDirectories(const std::string& path, unsigned mode) override;
+  [[nodiscard]] std::error_code createDirectories(const std::string& path, unsigned mode) override;
   // The file is readable by everybody whom the directory lets in, writable by its owner (0644).
-  std::unique_ptr<NewFile> createFile(const std::string& directory, const std::string& name,
-                                      std::error_code& error) override;
+  [[nodiscard]] std::unique_ptr<NewFile> createFile(const std::string& directory, const std::string& name,
+                                                    std::error_code& error) override;
   bool exists(const std::string& path) const override;
-  std::error_code readFile(const std::string& path, std::string& text) const override;
+  [[nodiscard]] std::error_code readFile(const std::string& path, std::string& text) const override;
   // A copy is there to be seen while it grows; one that fails is removed.
-  std::error_code moveFile(const std::string& from, const std::string& directory,
-                           const std::string& name) override;
+  [[nodiscard]] std::error_code moveFile(const std::string& from, const std::string& directory,
+                                         const std::string& name) override;
 
  private:
   // Once a directory.

@@ -17,8 +17,8 @@ class JsonBenchfile final : public Benchfile {
   // `clock` outlives this.
   explicit JsonBenchfile(const Clock& clock) : clock_(clock) {}
 
-  std::unique_ptr<BenchfileWriter> open(const std::string& path, std::string_view dataName,
-                                        int resultsVersion, int& systemError) override;
+  [[nodiscard]] std::unique_ptr<BenchfileWriter> open(const std::string& path, std::string_view dataName,
+                                                      int resultsVersion, int& systemError) override;
 
  private:
   const Clock& clock_;

@@ -34,7 +34,7 @@ class JsonTree {
   };
 
   // Below 4 GiB. When it fails, `words` say where and why, if the text is no JSON, and the tree is of no use.
-  Failure parse(std::string_view text, std::string& words);
+  [[nodiscard]] Failure parse(std::string_view text, std::string& words);
 
   const Node& root() const { return nodes_.front(); }
   // Of a field of an object, otherwise empty.

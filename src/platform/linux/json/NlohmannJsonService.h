@@ -13,9 +13,9 @@ class NlohmannJsonService final : public JsonService {
  public:
   std::string compact(const ValueMap& map) const override;
   // A problem reads "a.b[2] is nan, which JSON cannot say".
-  std::optional<std::string> pretty(const ValueMap& map, std::string& problem) const override;
+  [[nodiscard]] std::optional<std::string> pretty(const ValueMap& map, std::string& problem) const override;
   // A problem reads "a.b[2] is null" or is the library's, with line and column.
-  std::optional<Value> parse(std::string_view text, std::string& problem) const override;
+  [[nodiscard]] std::optional<Value> parse(std::string_view text, std::string& problem) const override;
 };
 
 }  // namespace tonewerk

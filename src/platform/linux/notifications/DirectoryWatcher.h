@@ -62,8 +62,8 @@ class DirectoryWatcher {
   // Watches what the paths lead to now, instead of what they led to before.
   void attach();
   // Watches the nearest directory above that is there. False when there is none to be watched.
-  bool watchAncestor();
-  int watch(const std::string& path, std::uint32_t events, int& failure);
+  [[nodiscard]] bool watchAncestor();
+  [[nodiscard]] int watch(const std::string& path, std::uint32_t events, int& failure);
   void noteProblem(int failure);
   // How long poll() may wait, in milliseconds; -1 for ever.
   int patience();

@@ -25,11 +25,11 @@ class InotifyNotificationService final : public NotificationService {
   InotifyNotificationService(const std::string& directory, const LogCategory& log);
 
   // Fails with kStatusInvalidName, and with kStatusFailed where the system has no inotify left.
-  Registration registerHandler(std::string_view name, SerialQueue& queue,
-                               std::function<void(Token)> handler) override;
-  std::optional<std::uint64_t> state(Token token) const override;
+  [[nodiscard]] Registration registerHandler(std::string_view name, SerialQueue& queue,
+                                             std::function<void(Token)> handler) override;
+  [[nodiscard]] std::optional<std::uint64_t> state(Token token) const override;
   void cancel(Token token) override;
-  std::error_code post(std::string_view name) override;
+  [[nodiscard]] std::error_code post(std::string_view name) override;
 
   // Makes the directory again, where it went with all around it.
   void makeDirectory();

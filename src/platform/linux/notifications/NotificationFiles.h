@@ -26,7 +26,7 @@ class NotificationFiles {
   // The name's state. Fails with std::errc::no_such_file_or_directory where there is no file, with
   // std::errc::result_out_of_range for one that holds no number of 64 bits, or too much, and with
   // std::errc::invalid_argument for what is no regular file.
-  std::optional<std::uint64_t> state(std::string_view name, std::error_code& error) const;
+  [[nodiscard]] std::optional<std::uint64_t> state(std::string_view name, std::error_code& error) const;
 
   // Posts the name with the state it has, whatever its file holds; a name without a file gets the state 0.
   // These two make the directory where it is missing. What root makes belongs to whom the directory around it
@@ -39,7 +39,7 @@ class NotificationFiles {
   std::string pathOf(std::string_view name) const;
   // Writes a file of its own name, and then lets `place` give it the right one.
   template <typename Place>
-  std::error_code put(std::uint64_t state, Place place) const;
+  [[nodiscard]] std::error_code put(std::uint64_t state, Place place) const;
 
   const std::string directory_;
 };

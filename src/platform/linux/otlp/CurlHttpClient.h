@@ -24,7 +24,7 @@ class CurlHttpClient final : public HttpClient {
   CurlHttpClient& operator=(const CurlHttpClient&) = delete;
   ~CurlHttpClient() override;
 
-  HttpAnswer post(const HttpRequest& request) override;
+  [[nodiscard]] HttpAnswer post(const HttpRequest& request) override;
   void cancel() override;
 
  private:
@@ -38,6 +38,6 @@ class CurlHttpClient final : public HttpClient {
 
 // "<base>/v1/logs" for the base address of an endpoint, which is an http or https URL with a host and neither
 // user, query nor fragment. Empty, with a problem, for anything else.
-std::string otlpLogsAddressOf(const std::string& base, std::string& problem);
+[[nodiscard]] std::string otlpLogsAddressOf(const std::string& base, std::string& problem);
 
 }  // namespace tonewerk

@@ -8,6 +8,6 @@
 namespace tonewerk {
 
 // `text` in gzip's format; none when there is no memory for it.
-std::optional<std::string> gzip(std::string_view text);
+[[nodiscard]] std::optional<std::string> gzip(std::string_view text);
 
 }  // namespace tonewerk

@@ -29,7 +29,7 @@ class HttpClient {
   virtual ~HttpClient() = default;
 
   // One thread at a time. Waits for the answer, within the client's time-outs. Never follows a redirection.
-  virtual HttpAnswer post(const HttpRequest& request) = 0;
+  [[nodiscard]] virtual HttpAnswer post(const HttpRequest& request) = 0;
 
   // Any thread. Ends a post() that is running; it and those that follow have no answer.
   virtual void cancel() = 0;

@@ -27,7 +27,7 @@ struct LinkReportBackends {
   static LinkReportBackends from(const std::optional<Value>& preference);
 
   // In the order of the preference, "local" first. None without any.
-  std::optional<std::vector<std::string>> names() const;
+  [[nodiscard]] std::optional<std::vector<std::string>> names() const;
 
  private:
   void add(const std::string& entry);

@@ -58,8 +58,8 @@ class LinuxLinkReport::Session final : public LinkReportSession {
     handler(backends.names());
   }
 
-  bool sendMessageWithCategory(std::uint16_t category, std::uint16_t type, const ValueMap& payload,
-                               std::string& problem) override {
+  [[nodiscard]] bool sendMessageWithCategory(std::uint16_t category, std::uint16_t type,
+                                             const ValueMap& payload, std::string& problem) override {
     const std::size_t bytes = payload.bytes();
     if (bytes > kMaxPayloadBytes) {
       problem = "a payload of " + std::to_string(bytes) + " bytes is too large";
@@ -67,7 +67,6 @@ class LinuxLinkReport::Session final : public LinkReportSession {
     }
     const double now = service_.clock_.now();
     if (isLocal_) service_.store_.record(RtcMessageRow{now, stored_, category, type, payload});
-    // A full outbox counts and logs what it drops itself, or there would be a line a message.
     if (!exporters_.empty()) exportMessage(now, category, type, payload);
     return true;
   }
@@ -89,7 +88,8 @@ class LinuxLinkReport::Session final : public LinkReportSession {
     record.type = type;
     record.payload = payload;
     record.repeatsEventName = repeatsEventName_;
-    for (OtlpExporter* exporter : exporters_) exporter->add(record, urgency_);
+    // An exporter counts what it drops and logs the sum: a line for each message would be too many.
+    for (OtlpExporter* exporter : exporters_) (void)exporter->add(record, urgency_);
   }
 
   bool booleanPreference(std::string_view key) const {

@@ -45,11 +45,10 @@ class LinuxLinkReport final : public LinkReport {
   LinuxLinkReport& operator=(const LinuxLinkReport&) = delete;
   ~LinuxLinkReport() override;
 
-  std::optional<std::string> newHierarchyTokenFromParentToken(
+  [[nodiscard]] std::optional<std::string> newHierarchyTokenFromParentToken(
       const std::optional<std::string>& parentToken) override;
-  std::unique_ptr<LinkReportSession> initWithSessionInfo(const ValueMap& sessionInfo,
-                                                         const ValueMap& userInfo,
-                                                         const ValueArray* frameworksToCheck) override;
+  [[nodiscard]] std::unique_ptr<LinkReportSession> initWithSessionInfo(
+      const ValueMap& sessionInfo, const ValueMap& userInfo, const ValueArray* frameworksToCheck) override;
 
   // Sends what waits for the network, for at most so long. Nothing is sent after it. False when something is
   // left.
@@ -60,7 +59,7 @@ class LinuxLinkReport final : public LinkReport {
 
   LinkReportBackends readBackends();
   // Null when there are too many already.
-  OtlpExporter* exporterFor(const std::string& url);
+  [[nodiscard]] OtlpExporter* exporterFor(const std::string& url);
   OtlpResource resource() const;
 
   ReportStore& store_;

@@ -17,7 +17,7 @@ struct OtlpAnswer {
 };
 
 // Out of the answer's JSON; none when it is not such an answer. An empty body accepts everything.
-std::optional<OtlpAnswer> parseOtlpAnswer(std::string_view body);
+[[nodiscard]] std::optional<OtlpAnswer> parseOtlpAnswer(std::string_view body);
 
 // A stranger's words for a log line: control characters replaced, cut after 200 bytes.
 std::string quotable(std::string_view text);

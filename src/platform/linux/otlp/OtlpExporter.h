@@ -33,14 +33,14 @@ class OtlpExporter {
   ~OtlpExporter();
 
   // False when there is no room for it: it is dropped and counted.
-  bool add(const OtlpLogRecord& record, OtlpOutbox::Urgency urgency);
+  [[nodiscard]] bool add(const OtlpLogRecord& record, OtlpOutbox::Urgency urgency);
   // What waits for its batch goes out now.
   void flush();
 
   // What waits goes out now, with one more try for what failed before; then nothing more.
   void beginEnd();
   // Until that is done, at most until `deadline`. False when it is not.
-  bool waitForEnd(std::chrono::steady_clock::time_point deadline);
+  [[nodiscard]] bool waitForEnd(std::chrono::steady_clock::time_point deadline);
 
  private:
   void run();

@@ -42,19 +42,19 @@ class OtlpOutbox {
 
   explicit OtlpOutbox(const Limits& limits) : limits_(limits) {}
 
-  Added add(std::string record, Urgency urgency, Time now);
+  [[nodiscard]] Added add(std::string record, Urgency urgency, Time now);
   // What waits now is due. False when nothing does.
-  bool flush();
+  [[nodiscard]] bool flush();
 
   // When something is due, perhaps in the past; none when nothing waits.
-  std::optional<Time> nextDue() const;
+  [[nodiscard]] std::optional<Time> nextDue() const;
   // Some of what is due, at least one record and not much more than `batchBytes`; empty when nothing is.
-  Batch take(Time now);
+  [[nodiscard]] Batch take(Time now);
   // What was taken is delivered or dropped: its room is free.
   void settle(const Batch& batch);
 
   // Records dropped for want of room since the last call.
-  std::uint64_t takeDropped();
+  [[nodiscard]] std::uint64_t takeDropped();
   // Records that wait or are being exported.
   std::size_t count() const;
 
@@ -64,8 +64,8 @@ class OtlpOutbox {
     Time addedAt;
   };
 
-  std::optional<Time> batchedDue() const REQUIRES(mutex_);
-  Batch takeFrom(std::deque<Waiting>& waiting) REQUIRES(mutex_);
+  [[nodiscard]] std::optional<Time> batchedDue() const REQUIRES(mutex_);
+  [[nodiscard]] Batch takeFrom(std::deque<Waiting>& waiting) REQUIRES(mutex_);
 
   const Limits limits_;
   mutable Mutex mutex_;

@@ -46,11 +46,11 @@ class OtlpSender {
  private:
   enum class Outcome { kGoOn, kWait };
 
-  Outcome sendNext();
-  HttpAnswer post(const OtlpOutbox::Batch& batch);
+  [[nodiscard]] Outcome sendNext();
+  [[nodiscard]] HttpAnswer post(const OtlpOutbox::Batch& batch);
   void delivered(const OtlpOutbox::Batch& batch, const HttpAnswer& answer);
   void takeAnswer(const OtlpOutbox::Batch& batch, const HttpAnswer& answer);
-  Outcome retryLater(const HttpAnswer& answer);
+  [[nodiscard]] Outcome retryLater(const HttpAnswer& answer);
   void split();
   void drop(const OtlpOutbox::Batch& batch, const std::string& why);
   void logOnce(const std::string& problem);

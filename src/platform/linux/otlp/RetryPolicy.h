@@ -31,7 +31,7 @@ class RetryPolicy {
     kDrop,   // any other refusal, redirections included
   };
   // `status` as HTTP has it, 0 without an answer.
-  static Verdict verdictOf(int status);
+  [[nodiscard]] static Verdict verdictOf(int status);
 
   // `jitter` gives numbers from 0 to below 1.
   explicit RetryPolicy(std::function<double()> jitter) : jitter_(std::move(jitter)) {}
@@ -48,6 +48,6 @@ class RetryPolicy {
 
 // The time that a Retry-After header asks for, as seconds from now or as a date of HTTP; `now` in seconds
 // since 1970. A date that has passed is zero; none for anything else.
-std::optional<std::chrono::seconds> parseRetryAfter(std::string_view text, double now);
+[[nodiscard]] std::optional<std::chrono::seconds> parseRetryAfter(std::string_view text, double now);
 
 }  // namespace tonewerk

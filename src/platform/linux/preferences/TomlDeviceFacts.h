@@ -17,7 +17,7 @@ class TomlDeviceFacts final : public DeviceFacts {
   // `log` outlives the facts.
   TomlDeviceFacts(std::string path, const LogCategory& log);
 
-  std::optional<bool> boolean(std::string_view property) const override;
+  [[nodiscard]] std::optional<bool> boolean(std::string_view property) const override;
 
   void readAgain();
 

@@ -36,12 +36,12 @@ class TomlPreferenceStore final : public PreferenceStore {
   };
   Layers readLayers(std::string_view domain) const;
 
-  std::optional<Value> read(std::string_view domain, std::string_view key) const override;
+  [[nodiscard]] std::optional<Value> read(std::string_view domain, std::string_view key) const override;
   ValueMap readAll(std::string_view domain) const override;
-  std::error_code write(std::string_view domain, std::string_view key, const Value& value,
-                        std::string* problem = nullptr) override;
-  std::error_code remove(std::string_view domain, std::string_view key,
-                         std::string* problem = nullptr) override;
+  [[nodiscard]] std::error_code write(std::string_view domain, std::string_view key, const Value& value,
+                                      std::string* problem = nullptr) override;
+  [[nodiscard]] std::error_code remove(std::string_view domain, std::string_view key,
+                                       std::string* problem = nullptr) override;
 
   // Read their files where they changed, so that what is wrong with them is logged now and not when somebody
   // needs them. A name that is no preference file's is nobody's.
@@ -65,8 +65,9 @@ class TomlPreferenceStore final : public PreferenceStore {
   Contents contentsOf(std::string_view domain) const;
   // Runs `change` on the domain's contents under the writers' lock, and stores what it leaves in `written`.
   template <typename Change>
-  std::error_code update(std::string_view domain, std::string* problem, Change change);
-  std::error_code store(std::string_view domain, const Contents& contents, std::string& problem) const;
+  [[nodiscard]] std::error_code update(std::string_view domain, std::string* problem, Change change);
+  [[nodiscard]] std::error_code store(std::string_view domain, const Contents& contents,
+                                      std::string& problem) const;
 
   const std::string configurationDirectory_;
   const std::string stateDirectory_;

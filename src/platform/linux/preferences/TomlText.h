@@ -16,12 +16,12 @@ namespace tonewerk {
 // with their keys in alphabetical order.
 
 // None when `text` is no TOML; `problem` is then "line:column: what is wrong".
-std::optional<ValueMap> parseToml(std::string_view text, std::string& problem);
+[[nodiscard]] std::optional<ValueMap> parseToml(std::string_view text, std::string& problem);
 
 // A text that parseToml() reads as equal values. None for values that TOML cannot say, named in `problem`.
-std::optional<std::string> tomlText(const ValueMap& map, std::string& problem);
+[[nodiscard]] std::optional<std::string> tomlText(const ValueMap& map, std::string& problem);
 
 // One value on the right side of "key = value", as people type it.
-std::optional<Value> parseTomlValue(std::string_view text);
+[[nodiscard]] std::optional<Value> parseTomlValue(std::string_view text);
 
 }  // namespace tonewerk

@@ -16,15 +16,15 @@ class ProtozeroReader final : public PB::Reader {
   // `bytes` outlives the reader.
   explicit ProtozeroReader(std::string_view bytes) : at_(bytes.data()), end_(bytes.data() + bytes.size()) {}
 
-  std::optional<Key> nextKey() override;
-  std::optional<std::uint64_t> readVarint() override;
-  std::optional<std::string> readBytes() override;
-  bool skip(const Key& key) override;
+  [[nodiscard]] std::optional<Key> nextKey() override;
+  [[nodiscard]] std::optional<std::uint64_t> readVarint() override;
+  [[nodiscard]] std::optional<std::string> readBytes() override;
+  [[nodiscard]] bool skip(const Key& key) override;
   bool hasError() const override { return hasError_; }
 
  private:
-  bool skip(const Key& key, int groups);
-  bool skipBytes(std::uint64_t count);
+  [[nodiscard]] bool skip(const Key& key, int groups);
+  [[nodiscard]] bool skipBytes(std::uint64_t count);
   bool fail();
 
   const char* at_;

@@ -13,11 +13,11 @@ class LinuxProcessInformation final : public ProcessInformation {
       : procDirectory_(std::move(procDirectory)) {}
 
   // PID/comm, which the kernel cuts to 15 bytes. What it leaves of a character reads as U+FFFD.
-  std::optional<std::string> processName(std::int32_t processIdentifier) const override;
+  [[nodiscard]] std::optional<std::string> processName(std::int32_t processIdentifier) const override;
   std::int32_t ownProcessIdentifier() const override;
   // RssAnon and VmSwap of self/status: counters that the kernel keeps anyway, unlike the precise walk over
   // all pages behind self/smaps_rollup.
-  std::variant<std::uint64_t, std::string> physicalFootprint() const override;
+  [[nodiscard]] std::variant<std::uint64_t, std::string> physicalFootprint() const override;
   std::int64_t processorTimeMicroseconds() const override;
 
  private:

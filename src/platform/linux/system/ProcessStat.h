@@ -45,7 +45,7 @@ struct ProcessStat {
   std::vector<std::string_view> fields;  // those behind the name; at least kFields
 
   // What it gives refers to `text`. None for what is no such text, or ends before kFields.
-  static std::optional<ProcessStat> parse(std::string_view text) {
+  [[nodiscard]] static std::optional<ProcessStat> parse(std::string_view text) {
     const std::size_t opening = text.find('(');
     const std::size_t closing = text.rfind(')');
     if (opening == std::string_view::npos || closing == std::string_view::npos || closing < opening) {

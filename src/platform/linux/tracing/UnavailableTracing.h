@@ -13,7 +13,8 @@ namespace tonewerk {
 class UnavailableRuntrace final : public Runtrace {
  public:
   explicit UnavailableRuntrace(std::string reason) : reason_(std::move(reason)) {}
-  std::shared_ptr<RuntraceSession> makeSession(const RuntraceConfiguration& configuration) override;
+  [[nodiscard]] std::shared_ptr<RuntraceSession> makeSession(
+      const RuntraceConfiguration& configuration) override;
 
  private:
   const std::string reason_;
@@ -23,7 +24,8 @@ class UnavailableRuntrace final : public Runtrace {
 class UnavailableKolvi final : public Kolvi {
  public:
   explicit UnavailableKolvi(std::string reason) : reason_(std::move(reason)) {}
-  std::unique_ptr<KolviModel> openModel(const std::string& traceLocation, std::string& problem) override;
+  [[nodiscard]] std::unique_ptr<KolviModel> openModel(const std::string& traceLocation,
+                                                      std::string& problem) override;
 
  private:
   const std::string reason_;

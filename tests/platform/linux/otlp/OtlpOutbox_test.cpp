@@ -82,7 +82,7 @@ TEST_F(OtlpOutboxTest, KeepsEightMegabytesUntilTheyAreSettled) {
   EXPECT_EQ(add(""), Added::kDropped);
   EXPECT_EQ(outbox_.count(), 8U);
 
-  outbox_.flush();
+  EXPECT_TRUE(outbox_.flush());
   const OtlpOutbox::Batch batch = outbox_.take(now_);
   EXPECT_EQ(add("taken is not gone"), Added::kDropped);
   outbox_.settle(batch);

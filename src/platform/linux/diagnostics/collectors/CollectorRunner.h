@@ -27,7 +27,7 @@ class CollectorRunner {
   ~CollectorRunner();
 
   // One thread.
-  DiagnosticEvidence run();
+  [[nodiscard]] DiagnosticEvidence run();
 
   // Any thread. A run() under way returns soon, and later ones at once: with what was collected so far.
   void interrupt();
@@ -35,8 +35,8 @@ class CollectorRunner {
  private:
   struct Shared;
 
-  DiagnosticCollector::Result runOne(std::size_t index);
-  DiagnosticCollector::Result await(std::size_t index);
+  [[nodiscard]] DiagnosticCollector::Result runOne(std::size_t index);
+  [[nodiscard]] DiagnosticCollector::Result await(std::size_t index);
 
   const Limits limits_;
   const std::vector<std::shared_ptr<DiagnosticCollector>> collectors_;

@@ -21,7 +21,7 @@ class DiagnosticCollector {
   virtual std::string_view fileName() const = 0;
 
   // Bounded in what it reads; what it takes too long for is its runner's to judge.
-  virtual Result collect() = 0;
+  [[nodiscard]] virtual Result collect() = 0;
 };
 
 }  // namespace tonewerk

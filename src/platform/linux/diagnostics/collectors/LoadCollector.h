@@ -13,7 +13,7 @@ class LoadCollector final : public DiagnosticCollector {
   explicit LoadCollector(std::string procDirectory = "/proc") : procDirectory_(std::move(procDirectory)) {}
 
   std::string_view fileName() const override { return "load.txt"; }
-  Result collect() override;
+  [[nodiscard]] Result collect() override;
 
  private:
   const std::string procDirectory_;

@@ -15,7 +15,7 @@ class LogTailCollector final : public DiagnosticCollector {
   explicit LogTailCollector(std::shared_ptr<const RecentLines> lines) : lines_(std::move(lines)) {}
 
   std::string_view fileName() const override { return "log.txt"; }
-  Result collect() override { return {lines_->text(), ""}; }
+  [[nodiscard]] Result collect() override { return {lines_->text(), ""}; }
 
  private:
   const std::shared_ptr<const RecentLines> lines_;

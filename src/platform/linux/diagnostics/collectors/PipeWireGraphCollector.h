@@ -19,7 +19,7 @@ class PipeWireGraphCollector final : public DiagnosticCollector {
       : command_(std::move(command)), limits_(limits) {}
 
   std::string_view fileName() const override { return "pipewire.json"; }
-  Result collect() override;
+  [[nodiscard]] Result collect() override;
 
  private:
   const std::vector<std::string> command_;

@@ -18,7 +18,7 @@ class ProcessTableCollector final : public DiagnosticCollector {
       : procDirectory_(std::move(procDirectory)), maxRows_(maxRows) {}
 
   std::string_view fileName() const override { return "processes.txt"; }
-  Result collect() override;
+  [[nodiscard]] Result collect() override;
 
  private:
   const std::string procDirectory_;

@@ -25,7 +25,7 @@ class SoundStatusCollector final : public DiagnosticCollector {
       : directory_(std::move(directory)), limits_(limits) {}
 
   std::string_view fileName() const override { return "sound.txt"; }
-  Result collect() override;
+  [[nodiscard]] Result collect() override;
 
  private:
   const std::string directory_;

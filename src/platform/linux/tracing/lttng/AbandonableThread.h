@@ -31,7 +31,7 @@ class AbandonableThread {
 
     void run();
     void end();
-    bool waitForEnd(std::chrono::milliseconds patience);
+    [[nodiscard]] bool waitForEnd(std::chrono::milliseconds patience);
 
     mutable Mutex mutex_;
     Condition changed_;

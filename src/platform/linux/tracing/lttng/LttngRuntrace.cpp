@@ -108,7 +108,7 @@ class LttngRuntrace::Control {
     return problem.empty() ? RuntraceError() : problem;
   }
 
-  std::string begin(Course& course) {
+  [[nodiscard]] std::string begin(Course& course) {
     const WantedSignposts wanted =
         readWantedSignposts(course.configuration.probeListPath, parts_.files, parts_.json);
     if (!wanted.problem.empty()) return wanted.problem;
@@ -128,7 +128,7 @@ class LttngRuntrace::Control {
     return problem;
   }
 
-  std::string startTrace(Course& course, std::set<std::string> signposts) {
+  [[nodiscard]] std::string startTrace(Course& course, std::set<std::string> signposts) {
     std::error_code error;
     const std::string name = "tonewerk-" + std::to_string(::getpid()) + "-" + std::to_string(++count_);
     course.directory = TraceDirectory::make(parts_.directory, name, error);
@@ -149,7 +149,7 @@ class LttngRuntrace::Control {
     return problem;
   }
 
-  std::string ensureDaemon() {
+  [[nodiscard]] std::string ensureDaemon() {
     const CallLimit limit(daemon_, parts_.timers);
     return daemon_.ensureRunning();
   }

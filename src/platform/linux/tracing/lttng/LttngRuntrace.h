@@ -26,7 +26,8 @@ class LttngRuntrace final : public Runtrace {
   // Gives up traces that are under way and ends the private session daemon.
   ~LttngRuntrace() override;
 
-  std::shared_ptr<RuntraceSession> makeSession(const RuntraceConfiguration& configuration) override;
+  [[nodiscard]] std::shared_ptr<RuntraceSession> makeSession(
+      const RuntraceConfiguration& configuration) override;
 
  private:
   class Control;

@@ -29,28 +29,28 @@ class LttngTrace {
   ~LttngTrace();
 
   // Records what programs of this device pass of these signposts.
-  std::string start(const std::set<std::string>& signposts);
+  [[nodiscard]] std::string start(const std::set<std::string>& signposts);
   // Afterwards everything is on the disk.
-  std::string stop();
+  [[nodiscard]] std::string stop();
   // Also says what only shows now: a disk that was full, a writer that died, events that were lost.
-  std::string destroy();
+  [[nodiscard]] std::string destroy();
 
   // Whether the tracepoints of this very process have reached the session daemon: if not, other programs'
   // need not have either.
-  static std::string checkThisProcessIsSeen(SessionDaemon& daemon, TimerService& timers);
+  [[nodiscard]] static std::string checkThisProcessIsSeen(SessionDaemon& daemon, TimerService& timers);
 
  private:
   struct Handle;
 
-  std::string createSession();
-  std::string configure(const std::set<std::string>& signposts);
-  std::string enableChannel();
-  std::string addContexts();
-  std::string enableSignposts(const std::set<std::string>& signposts);
-  std::string countLosses();
-  std::string waitForData();
+  [[nodiscard]] std::string createSession();
+  [[nodiscard]] std::string configure(const std::set<std::string>& signposts);
+  [[nodiscard]] std::string enableChannel();
+  [[nodiscard]] std::string addContexts();
+  [[nodiscard]] std::string enableSignposts(const std::set<std::string>& signposts);
+  [[nodiscard]] std::string countLosses();
+  [[nodiscard]] std::string waitForData();
   template <typename Call>
-  int limited(Call call);
+  [[nodiscard]] int limited(Call call);
 
   const std::string name_;
   const std::string directory_;

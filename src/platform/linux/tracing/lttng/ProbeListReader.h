@@ -20,7 +20,7 @@ struct WantedSignposts {
   std::string problem;  // empty when the list is good
 };
 
-WantedSignposts readWantedSignposts(const std::string& path, const FileSystem& files,
-                                    const JsonService& json);
+[[nodiscard]] WantedSignposts readWantedSignposts(const std::string& path, const FileSystem& files,
+                                                  const JsonService& json);
 
 }  // namespace tonewerk

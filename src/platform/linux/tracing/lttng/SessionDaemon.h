@@ -25,7 +25,7 @@ class SessionDaemon {
   ~SessionDaemon();
 
   // Empty when one runs and answers, else why none does.
-  std::string ensureRunning();
+  [[nodiscard]] std::string ensureRunning();
 
   // Whether the one in use was started here.
   bool isPrivate() const;
@@ -35,8 +35,8 @@ class SessionDaemon {
   void kill();
 
  private:
-  std::string startPrivate();
-  std::string waitUntilItAnswers();
+  [[nodiscard]] std::string startPrivate();
+  [[nodiscard]] std::string waitUntilItAnswers();
   bool hasEnded();
   std::string lastWords() const;
 

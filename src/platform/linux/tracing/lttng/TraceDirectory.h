@@ -11,8 +11,8 @@ namespace tonewerk {
 class TraceDirectory {
  public:
   // Makes `name` in `parent`, which is made, too, when it is missing. Null, and `error` set, when that fails.
-  static std::shared_ptr<TraceDirectory> make(const std::string& parent, const std::string& name,
-                                              std::error_code& error);
+  [[nodiscard]] static std::shared_ptr<TraceDirectory> make(const std::string& parent,
+                                                            const std::string& name, std::error_code& error);
   // Removes what an earlier process left in `parent`.
   static void removeLeftovers(const std::string& parent);
 

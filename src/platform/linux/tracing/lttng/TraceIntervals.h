@@ -16,6 +16,6 @@ using TraceIntervals = std::map<std::string, std::vector<std::uint64_t>, std::le
 
 // Reads what tw-trace-reader writes. None when it is anything else or not all of it; `problem` then says why,
 // in the reader's own words when it has some.
-std::optional<TraceIntervals> parseTraceIntervals(std::string_view text, std::string& problem);
+[[nodiscard]] std::optional<TraceIntervals> parseTraceIntervals(std::string_view text, std::string& problem);
 
 }  // namespace tonewerk

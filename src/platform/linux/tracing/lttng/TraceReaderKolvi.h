@@ -20,7 +20,8 @@ class TraceReaderKolvi final : public Kolvi {
 
   explicit TraceReaderKolvi(std::string readerPath, std::chrono::milliseconds timeout = kTimeout);
 
-  std::unique_ptr<KolviModel> openModel(const std::string& traceLocation, std::string& problem) override;
+  [[nodiscard]] std::unique_ptr<KolviModel> openModel(const std::string& traceLocation,
+                                                      std::string& problem) override;
 
  private:
   const std::string readerPath_;
