@@ -14,7 +14,7 @@ namespace tonewerk {
 namespace {
 
 std::error_code writeSynced(int directory, const std::string& name, std::string_view text) {
-  // What a crash left behind is of no use, and may not even be a file.
+  // A crash may have left something under this name, possibly not even a file.
   unlinkat(directory, name.c_str(), 0);
   const FileDescriptor file(
       openat(directory, name.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0644));

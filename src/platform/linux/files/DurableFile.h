@@ -7,9 +7,9 @@
 
 namespace tonewerk {
 
-// Puts `text` into the file `name` of `directory` so that readers, also after a crash, see the old file or
-// the new one and nothing between: writes "<name>.new", syncs it and renames it. One writer at a time. The
-// file of root belongs to whom the directory belongs to.
+// Replaces the contents of the file `name` in `directory` with `text`. Readers see either the old file or the
+// new one, even after a crash: the function writes "<name>.new", syncs it and renames it. Only one writer at
+// a time may call it. When the process is root, the new file gets the directory's owner and group.
 [[nodiscard]] std::error_code replaceFile(const std::string& directory, const std::string& name,
                                           std::string_view text);
 

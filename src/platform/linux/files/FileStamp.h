@@ -6,8 +6,8 @@
 
 namespace tonewerk {
 
-// Which file this is, in which state. Two equal stamps of which the first was settled when it was taken mean
-// the same contents.
+// Identifies a file and its state. Two equal stamps mean the same contents if the first was settled when it
+// was taken.
 struct FileStamp {
   dev_t device;
   ino_t inode;
@@ -16,9 +16,9 @@ struct FileStamp {
   std::int64_t changedNanoseconds;
 
   static FileStamp of(const struct stat& status);
-  // Whether a later change is sure to show. File times move in ticks of some milliseconds, and a new file may
-  // get the number of one that is gone: so a file that changed just now may change again without a trace in
-  // its stamp; after a second it cannot.
+  // Whether any later change will change the stamp. File times advance in ticks of some milliseconds, and a
+  // new file may get the inode number of a removed one. So a file may change twice within a tick and keep its
+  // stamp. A second after the last change that is no longer possible.
   bool isSettled() const;
 
   friend bool operator==(const FileStamp&, const FileStamp&) = default;

@@ -10,14 +10,14 @@
 
 namespace tonewerk {
 
-// Lines of the form "Name:   value ...", as the kernel's status and meminfo files are.
+// Finds values in lines of the form "Name:   value ...", which the kernel's status and meminfo files have.
 class KeyValueLines {
  public:
-  // `text` outlives this and what find() gives.
+  // `text` must outlive this object and the results of find().
   explicit KeyValueLines(std::string_view text) : text_(text) {}
 
-  // What comes behind the name and white space, up to the line's end; none without such a line: not every
-  // kernel has every line. The first of several.
+  // The text after the name and the white space, up to the end of the line. If several lines have the name,
+  // the first one counts. None if no line has it; not every kernel writes every line.
   [[nodiscard]] std::optional<std::string_view> find(std::string_view name) const {
     for (std::string_view rest = text_; !rest.empty();) {
       std::string_view line = rest.substr(0, rest.find('\n'));
@@ -30,7 +30,7 @@ class KeyValueLines {
     return std::nullopt;
   }
 
-  // The number that the line's value begins with; none without one.
+  // The number at the beginning of the line's value; none if there is no such line or number.
   [[nodiscard]] std::optional<std::uint64_t> number(std::string_view name) const {
     const std::string_view value = find(name).value_or(std::string_view());
     std::uint64_t number = 0;

@@ -35,7 +35,8 @@ bool isDirectory(const std::string& path) {
   return stat(path.c_str(), &status) == 0 && S_ISDIR(status.st_mode);
 }
 
-// What was just made at `path` gets its mode, of which the process's mask has taken bits away, and its owner.
+// Sets the mode and the owner of the new directory at `path`. mkdir() has removed the bits of the process's
+// umask from the mode.
 std::error_code finishDirectory(const std::string& path, mode_t mode) {
   const FileDescriptor made(open(path.c_str(), O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC));
   if (!made) return lastSystemError();
@@ -46,7 +47,7 @@ std::error_code finishDirectory(const std::string& path, mode_t mode) {
 }
 
 std::error_code createDirectory(const std::string& path, mode_t mode) {
-  // Readable and open to us until it has its mode.
+  // finishDirectory() has to open the directory before it sets the mode.
   if (mkdir(path.c_str(), mode | S_IRWXU) == 0) return finishDirectory(path, mode);
   const std::error_code error = lastSystemError();
   if (isDirectory(path)) return {};
@@ -60,8 +61,8 @@ std::error_code renameToNew(int fromDirectory, const std::string& from, int dire
   return lastSystemError();
 }
 
-// What renameToNew() fails with on a file system that can only rename over others.
-constexpr std::errc kCannotKeep = std::errc::invalid_argument;
+// renameToNew() fails with this on a file system that cannot rename without replacing.
+constexpr std::errc kNoReplaceUnsupported = std::errc::invalid_argument;
 
 std::string newHiddenName() {
   static thread_local std::random_device random;
@@ -70,7 +71,7 @@ std::string newHiddenName() {
 
 class HiddenFile final : public NewFile {
  public:
-  // Null with `error` when the directory takes no file.
+  // Null, with `error` set, if no file can be created in the directory.
   static std::unique_ptr<HiddenFile> make(FileDescriptor directory, std::error_code& error) {
     auto made = std::make_unique<HiddenFile>(std::move(directory));
     error = made->open();
@@ -91,21 +92,21 @@ class HiddenFile final : public NewFile {
   [[nodiscard]] std::error_code place(const std::string& name) override {
     if (!isPlainName(name)) return std::make_error_code(std::errc::invalid_argument);
     if (failure_) return failure_;
-    // Else a crash of the system could leave the name with half of the text, or none, behind it.
+    // Without this, the file could be incomplete or empty after a crash of the system.
     if (fsync(file_.get()) != 0) return failure_ = lastSystemError();
     std::error_code error = renameToNew(directory_.get(), hiddenName_, directory_.get(), name);
-    if (error == kCannotKeep) error = moveByLink(name);
+    if (error == kNoReplaceUnsupported) error = moveByLink(name);
     if (error) return error;
     hiddenName_.clear();
-    // The name is in the directory, which is a file of its own.
+    // The name is stored in the directory, which has to be synced separately.
     return fsync(directory_.get()) == 0 ? std::error_code() : lastSystemError();
   }
 
  private:
   static constexpr int kMaxAttempts = 8;
 
-  // Another process that looks for leftovers may come between the making and the locking; then another file
-  // is made. Who comes each time does not look for leftovers.
+  // Another process may take the new file for a leftover before it is locked. Then the next attempt creates
+  // another file. If that happens at every attempt, the other process is not looking for leftovers.
   [[nodiscard]] std::error_code open() {
     for (int attempt = 0; attempt < kMaxAttempts; ++attempt) {
       const std::error_code error = create();
@@ -116,7 +117,6 @@ class HiddenFile final : public NewFile {
     return std::make_error_code(std::errc::resource_unavailable_try_again);
   }
 
-  // Under a new name.
   [[nodiscard]] std::error_code create() {
     std::string name = newHiddenName();
     constexpr int kFlags = O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
@@ -126,11 +126,12 @@ class HiddenFile final : public NewFile {
     return {};
   }
 
-  // False when somebody else has locked the file, or removed it.
+  // False if another process has locked or removed the file.
   //
-  // Some file systems lock nothing (shares in a network, those in user space). The file is written there all
-  // the same: who cannot lock takes nothing for a leftover either. Only where the system is out of locks for
-  // a moment may another process take it for one; then place() fails.
+  // Some file systems do not support locks (network shares, file systems in user space). The file is written
+  // without a lock there. That is safe, because a process that cannot lock a file does not remove it as a
+  // leftover. If the system is out of locks for a moment, another process may remove the file; then place()
+  // fails.
   [[nodiscard]] bool lock() {
     if (flock(file_.get(), LOCK_EX | LOCK_NB) != 0) return errno != EWOULDBLOCK;
     struct stat status {};
@@ -144,20 +145,21 @@ class HiddenFile final : public NewFile {
     return {};
   }
 
-  // The hidden name, and with it the file unless it has another one.
+  // Removes the hidden name. The file is gone too, unless it has another name.
   void remove() {
     if (!hiddenName_.empty()) unlinkat(directory_.get(), hiddenName_.c_str(), 0);
     hiddenName_.clear();
   }
 
   FileDescriptor directory_;
-  std::string hiddenName_;  // empty before the file is made, and once it has its place
+  std::string hiddenName_;  // empty until the file exists, and after it was placed
   FileDescriptor file_;
   std::error_code failure_;
 };
 
-// Removes a file that nobody writes any more. Ours alone: what others put there is theirs. The lock is held
-// meanwhile, so that who has just made the file sees it gone when the lock is free.
+// Removes the file if it is a leftover: a regular file of this user that no process has locked. The lock is
+// held until the file is removed. So a process that created the file a moment ago and waits to lock it then
+// sees that the file is gone.
 void removeIfLeftover(int directory, const char* name) {
   const FileDescriptor file(openat(directory, name, O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
   struct stat status {};
@@ -175,7 +177,7 @@ std::error_code copyAll(int from, int to) {
   }
 }
 
-// Copies the file `from` to a new one, and leaves none when that fails.
+// Copies the file `from` to a new file, which is removed if copying fails.
 std::error_code copyFile(const std::string& from, int directory, const std::string& name) {
   const FileDescriptor source(open(from.c_str(), O_RDONLY | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC));
   if (!source) return lastSystemError();
@@ -183,7 +185,7 @@ std::error_code copyFile(const std::string& from, int directory, const std::stri
       openat(directory, name.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, kFileMode);
   if (descriptor < 0) return lastSystemError();
   std::error_code error = copyAll(source.get(), descriptor);
-  // An interrupted close() has closed all the same.
+  // close() has closed the descriptor even if it was interrupted.
   if (::close(descriptor) != 0 && errno != EINTR && !error) error = lastSystemError();
   if (error) static_cast<void>(unlinkat(directory, name.c_str(), 0));
   return error;
@@ -235,7 +237,7 @@ void LinuxFileSystem::removeLeftovers(const std::string& path, int directory) {
     const MutexLock lock(mutex_);
     if (!swept_.insert(path).second) return;
   }
-  std::error_code error;  // a directory that cannot be read keeps what it has
+  std::error_code error;  // leftovers stay in a directory that cannot be read
   for (std::filesystem::directory_iterator at(path, error), end; !error && at != end; at.increment(error)) {
     const std::string name = at->path().filename().string();
     if (name.starts_with(kHiddenPrefix)) removeIfLeftover(directory, name.c_str());
@@ -261,7 +263,7 @@ std::error_code LinuxFileSystem::moveFile(const std::string& from, const std::st
   const FileDescriptor parent(open(directory.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
   if (!parent) return lastSystemError();
   const std::error_code error = renameToNew(AT_FDCWD, from, parent.get(), name);
-  const bool needsCopy = error == std::errc::cross_device_link || error == kCannotKeep;
+  const bool needsCopy = error == std::errc::cross_device_link || error == kNoReplaceUnsupported;
   return needsCopy ? copyAndRemove(from, parent.get(), name) : error;
 }
 

@@ -9,32 +9,33 @@
 
 namespace tonewerk {
 
-// The kernel's files. Errors are those of the system calls; a name that is no plain name is
-// std::errc::invalid_argument.
+// Reads and writes the kernel's files. Errors are those of the system calls. A name that is not a plain file
+// name fails with std::errc::invalid_argument.
 //
-// A new file is written beside its place under a hidden name, ".new-" and a number, with a lock on it that
-// its process's death ends. The first one in a directory removes what lies there under such names, is this
-// user's and has no lock: what processes left that were killed. So other processes may write there, too. A
-// file system without locks keeps what they left.
+// A new file is first written in its directory under a hidden name: ".new-" and a number. It is locked, and
+// the kernel releases the lock when the process dies. The first new file in a directory removes leftovers of
+// killed processes: files with such a name that belong to this user and are not locked. So several processes
+// may write to one directory. On a file system without locks, leftovers stay.
 class LinuxFileSystem final : public FileSystem {
  public:
-  // What root makes belongs to whom the directory around it belongs to.
+  // When the process is root, each new directory gets the owner of the directory that contains it.
   [[nodiscard]] std::error_code createDirectories(const std::string& path, unsigned mode) override;
-  // The file is readable by everybody whom the directory lets in, writable by its owner (0644).
+  // The file has the mode 0644.
   [[nodiscard]] std::unique_ptr<NewFile> createFile(const std::string& directory, const std::string& name,
                                                     std::error_code& error) override;
   bool exists(const std::string& path) const override;
   [[nodiscard]] std::error_code readFile(const std::string& path, std::string& text) const override;
-  // A copy is there to be seen while it grows; one that fails is removed.
+  // Between file systems the file is copied. The copy is visible while it grows; it is removed if copying
+  // fails.
   [[nodiscard]] std::error_code moveFile(const std::string& from, const std::string& directory,
                                          const std::string& name) override;
 
  private:
-  // Once a directory.
+  // Does nothing when the directory was cleaned before.
   void removeLeftovers(const std::string& path, int directory);
 
   Mutex mutex_;
-  std::set<std::string> swept_ GUARDED_BY(mutex_);  // the directories, by path
+  std::set<std::string> swept_ GUARDED_BY(mutex_);  // paths of directories
 };
 
 }  // namespace tonewerk

@@ -5,12 +5,12 @@
 
 namespace tonewerk {
 
-// Gives `made`, a file or directory that this process has just made in `directory`, the owner and the group
-// of that directory, when the process is root; for others there is nothing to do. So what root writes among a
-// daemon's files stays the daemon's.
+// Sets the owner and the group of `made` to those of `directory` if the process is root; otherwise it does
+// nothing. `made` is a file or directory that this process has just created in `directory`. So files that
+// root writes among a daemon's files belong to the daemon.
 //
-// Both are open descriptors: a name could lead to something else by now. What was there before is not to be
-// given away, since somebody may have linked it there.
+// Both arguments are open descriptors, because a name could lead to another file by now. Never call this for
+// a file that existed before: somebody may have linked a file of root's there.
 [[nodiscard]] std::error_code giveToOwnerOf(int directory, int made);
 
 }  // namespace tonewerk

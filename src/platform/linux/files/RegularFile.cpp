@@ -11,7 +11,7 @@
 namespace tonewerk {
 
 std::error_code RegularFile::open(const std::string& path, struct stat& status) {
-  // Non-blocking, so that a pipe in the file's place cannot hold the caller.
+  // Non-blocking, so that a pipe at this path cannot block the caller.
   file_ = FileDescriptor(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
   return file_ ? this->status(status) : lastSystemError();
 }
@@ -23,12 +23,10 @@ std::error_code RegularFile::status(struct stat& status) const {
   return {};
 }
 
-std::error_code RegularFile::read(std::size_t expectedBytes, std::size_t mostBytes,
-                                  std::string& bytes) const {
+std::error_code RegularFile::read(std::size_t expectedBytes, std::size_t maxBytes, std::string& bytes) const {
   constexpr std::size_t kAtOnce = 4096;
-  // One byte more than there should be, which shows a file that is larger. Those of /proc say that they are
-  // empty.
-  bytes.resize(expectedBytes == 0 ? kAtOnce : std::min(expectedBytes, mostBytes) + 1);
+  // One byte more than expected shows that the file is larger. Files in /proc report a size of 0.
+  bytes.resize(expectedBytes == 0 ? kAtOnce : std::min(expectedBytes, maxBytes) + 1);
   std::size_t size = 0;
   std::error_code error;
   for (;;) {
@@ -37,7 +35,7 @@ std::error_code RegularFile::read(std::size_t expectedBytes, std::size_t mostByt
     if (count < 0) error = lastSystemError();
     if (count <= 0) break;
     size += static_cast<std::size_t>(count);
-    if (size > mostBytes) error = std::make_error_code(std::errc::file_too_large);
+    if (size > maxBytes) error = std::make_error_code(std::errc::file_too_large);
     if (error) break;
     if (size == bytes.size()) bytes.resize(size + kAtOnce);
   }

@@ -10,18 +10,19 @@
 
 namespace tonewerk {
 
-// A regular file that is open for reading; those under /proc and /sys are such files, too.
+// Reads a regular file. Files under /proc and /sys are regular files, too.
 class RegularFile {
  public:
-  // Never waits, whatever stands in the file's place. `status` is what the file is. Fails with
-  // std::errc::is_a_directory or invalid_argument for what is no regular file, or with the system's error.
+  // Opens the file and reads its `status`. Never blocks, even if there is a pipe at `path`. Fails with
+  // std::errc::is_a_directory for a directory, with invalid_argument for anything else that is not a regular
+  // file, or with the system's error.
   [[nodiscard]] std::error_code open(const std::string& path, struct stat& status);
-  // What the open file is now.
+  // Reads the open file's current status. Fails as open() does.
   [[nodiscard]] std::error_code status(struct stat& status) const;
-  // The file's bytes up to its end, to be called once. Fails with std::errc::file_too_large when there are
-  // more than `mostBytes`, or with the system's error; `bytes` holds what came until then. `expectedBytes`
-  // are asked for at once; a wrong number costs calls, not bytes.
-  [[nodiscard]] std::error_code read(std::size_t expectedBytes, std::size_t mostBytes,
+  // Reads the file up to its end; call it once. Fails with std::errc::file_too_large if there are more than
+  // `maxBytes` bytes, or with the system's error; `bytes` then holds what was read until then. The first call
+  // of the system asks for `expectedBytes`; a wrong number only costs more calls.
+  [[nodiscard]] std::error_code read(std::size_t expectedBytes, std::size_t maxBytes,
                                      std::string& bytes) const;
 
  private:

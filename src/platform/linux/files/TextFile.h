@@ -8,19 +8,19 @@
 
 namespace tonewerk {
 
-// Reads a whole file, at most 16 MiB of it (else std::errc::file_too_large). `status`, when it is not null,
-// is what the file was while it was read. Only regular files, which those under /proc and /sys are, too.
+// Reads a whole regular file (files under /proc and /sys included). Fails with std::errc::file_too_large if
+// it has more than 16 MiB. If `status` is not null, it is set to the file's status before reading.
 [[nodiscard]] std::error_code readFileBytes(const std::string& path, std::string& bytes,
                                             struct stat* status = nullptr);
 
-// The same of a file that somebody or something just filled with words: what is no UTF-8 in it reads as
-// U+FFFD. A process cut its name to 15 bytes, a card its own to as many as fit.
+// Like readFileBytes(), but replaces bytes that are not UTF-8 by U+FFFD. The kernel cuts names of processes
+// and sound cards at a number of bytes, which may be within a character.
 [[nodiscard]] std::error_code readTextFile(const std::string& path, std::string& text);
 
-// All of `text`, in as many calls as it takes, into a descriptor that waits.
+// Writes all of `text` to a blocking descriptor, in as many calls as necessary.
 [[nodiscard]] std::error_code writeAll(int descriptor, std::string_view text);
 
-// The error that the last failed system call of this thread left behind.
+// The error of this thread's last failed system call (errno).
 std::error_code lastSystemError();
 
 }  // namespace tonewerk

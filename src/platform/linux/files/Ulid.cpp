@@ -40,7 +40,7 @@ std::string UlidGenerator::next(double now) {
   for (int digit = 0; digit < kTimeDigits; ++digit) {
     text[static_cast<std::size_t>(kTimeDigits - 1 - digit)] = kDigits[milliseconds_ >> (5 * digit) & 31];
   }
-  // 80 bits are 16 digits of five.
+  // 80 random bits are 16 digits of five bits each.
   for (std::size_t digit = 0; digit < 16; ++digit) {
     const std::size_t bit = digit * 5;
     const unsigned high = tail_[bit / 8];

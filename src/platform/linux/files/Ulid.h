@@ -8,17 +8,18 @@
 
 namespace tonewerk {
 
-// Makes ULIDs: identifiers of 26 characters, unique anywhere, that sort in the order in which one generator
-// made them. One thread.
+// Makes ULIDs: globally unique identifiers of 26 characters. The identifiers of one generator sort in the
+// order in which it made them. Not thread-safe.
 class UlidGenerator {
  public:
   using Random = std::function<std::uint32_t()>;
 
-  // The system's randomness.
+  // Uses the system's random numbers.
   UlidGenerator();
   explicit UlidGenerator(Random random) : random_(std::move(random)) {}
 
-  // `now` in seconds since 1970. Identifiers of one millisecond, and of a clock that went back, count up.
+  // `now` is in seconds since 1970. Within one millisecond, and if the clock goes back, the random part
+  // counts up.
   std::string next(double now);
 
  private:

@@ -8,14 +8,14 @@
 namespace tonewerk {
 namespace {
 
-// A new name, or none, changes a file's time of status, not its contents.
+// Compares no status-change time: adding or removing a name changes that time, but not the contents.
 bool isSameContent(const FileStamp& a, const FileStamp& b) {
   return a.size == b.size && a.modifiedNanoseconds == b.modifiedNanoseconds;
 }
 
 }  // namespace
 
-std::error_code readWholeFile(const std::string& path, std::size_t mostBytes, std::string& text,
+std::error_code readWholeFile(const std::string& path, std::size_t maxBytes, std::string& text,
                               FileStamp& stamp) {
   for (int attempt = 0; attempt < kMaxAttempts; ++attempt) {
     text.clear();
@@ -24,7 +24,7 @@ std::error_code readWholeFile(const std::string& path, std::size_t mostBytes, st
     if (const std::error_code error = file.open(path, status)) return error;
     stamp = FileStamp::of(status);
     const auto size = static_cast<std::size_t>(status.st_size);
-    if (size > mostBytes) return std::make_error_code(std::errc::file_too_large);
+    if (size > maxBytes) return std::make_error_code(std::errc::file_too_large);
     const std::error_code error = file.read(size, size, text);
     if (error == std::errc::file_too_large) continue;  // it grew
     if (error) return error;

@@ -65,7 +65,7 @@ class JsonBenchfileWriter final : public BenchfileWriter {
   }
 
   const std::string path_;
-  FileDescriptor file_;  // none once it was closed well
+  FileDescriptor file_;  // none after close() succeeded
   std::string buffer_;
   std::error_code error_;  // the first one
   bool isFirst_ = true;
@@ -81,7 +81,7 @@ std::string hostName() {
 std::unique_ptr<BenchfileWriter> JsonBenchfile::open(const std::string& path, std::string_view dataName,
                                                      int resultsVersion, int& systemError) {
   systemError = 0;
-  // What cannot be removed is in the way of the new file, which then says so.
+  // If this fails, open() fails too and reports the error.
   static_cast<void>(::unlink(path.c_str()));
   FileDescriptor file(::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0644));
   if (!file) {

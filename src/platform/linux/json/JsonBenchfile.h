@@ -7,14 +7,14 @@ namespace tonewerk {
 
 class Clock;
 
-// Benchmark data as JSON in the layout that Google Benchmark's comparison tools read: a "context", which here
-// holds the data's name and version, and "benchmarks", one entry a line for each value. A trace knows nothing
-// of processor time, which those tools ask for: "cpu_time" repeats "real_time".
+// Writes benchmark data as JSON in the layout that Google Benchmark's comparison tools read: a "context" with
+// the name and the version of the data, and "benchmarks" with one entry per value and line. Those tools
+// require processor times, which a trace does not have; so "cpu_time" repeats "real_time".
 //
-// What stands at a file's path is removed first, so that a new file is made and no link followed.
+// open() first removes any file at the path. So it always creates a new file and follows no link.
 class JsonBenchfile final : public Benchfile {
  public:
-  // `clock` outlives this.
+  // `clock` must outlive this object.
   explicit JsonBenchfile(const Clock& clock) : clock_(clock) {}
 
   [[nodiscard]] std::unique_ptr<BenchfileWriter> open(const std::string& path, std::string_view dataName,

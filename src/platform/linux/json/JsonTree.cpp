@@ -6,10 +6,10 @@
 
 namespace tonewerk {
 
-// Takes what the library's reader finds; the names are its.
+// Receives the events of the library's SAX parser, which prescribes the names of the public functions.
 class JsonTree::Builder {
  public:
-  Builder(JsonTree& tree, std::string& words) : nodes_(tree.nodes_), text_(tree.text_), words_(words) {}
+  Builder(JsonTree& tree, std::string& message) : nodes_(tree.nodes_), text_(tree.text_), message_(message) {}
 
   Failure failure() const { return failure_; }
 
@@ -37,7 +37,7 @@ class JsonTree::Builder {
     text_ += value;
     return true;
   }
-  static bool binary(const std::vector<std::uint8_t>&) { return false; }  // there is none in JSON
+  static bool binary(const std::vector<std::uint8_t>&) { return false; }  // JSON has no binary values
   bool start_object(std::size_t) { return begin(Kind::kObject); }
   bool start_array(std::size_t) { return begin(Kind::kArray); }
   bool end_object() { return end(); }
@@ -52,7 +52,7 @@ class JsonTree::Builder {
   bool parse_error(std::size_t, const std::string&, const nlohmann::json::exception& error) {
     const bool isNotJson = dynamic_cast<const nlohmann::json::parse_error*>(&error) != nullptr;
     failure_ = isNotJson ? Failure::kNotJson : Failure::kNumberOutOfRange;
-    words_ = error.what();
+    message_ = error.what();
     return false;
   }
 
@@ -81,17 +81,17 @@ class JsonTree::Builder {
 
   std::vector<Node>& nodes_;
   std::string& text_;
-  std::string& words_;
-  std::vector<std::size_t> open_;  // arrays and objects that have begun
-  std::uint32_t keyBegin_ = 0;     // of the field whose value comes next
+  std::string& message_;
+  std::vector<std::size_t> open_;  // indices of the arrays and objects that are not complete yet
+  std::uint32_t keyBegin_ = 0;     // key of the field whose value comes next
   std::uint32_t keySize_ = 0;
   Failure failure_ = Failure::kNone;
 };
 
-JsonTree::Failure JsonTree::parse(std::string_view text, std::string& words) {
+JsonTree::Failure JsonTree::parse(std::string_view text, std::string& message) {
   nodes_.clear();
   text_.clear();
-  Builder builder(*this, words);
+  Builder builder(*this, message);
   nlohmann::json::sax_parse(text, &builder);
   return builder.failure();
 }

@@ -8,13 +8,14 @@
 
 namespace tonewerk {
 
-// A JSON text as a tree of values that lies in one piece of memory, in the order of the text: each value
-// before what it holds. For texts that are read whole, often, and only once; a tree of maps costs twice as
-// much.
+// Holds a JSON text as a tree of values in one array, in the order of the text: each array or object is
+// directly followed by its elements. Meant for texts that are parsed often and then read once from beginning
+// to end; a tree of maps costs twice as much.
 class JsonTree {
  public:
   enum class Kind : std::uint8_t { kNull, kBoolean, kInteger, kUnsigned, kDouble, kText, kArray, kObject };
-  enum class Failure { kNone, kNotJson, kNumberOutOfRange };  // the latter: beyond what a double can hold
+  // kNumberOutOfRange: a number is beyond the range of a double.
+  enum class Failure { kNone, kNotJson, kNumberOutOfRange };
 
   struct Node {
     union {
@@ -22,29 +23,30 @@ class JsonTree {
       std::int64_t integer;           // negative ones
       std::uint64_t unsignedInteger;  // all others that 64 bits can hold
       double number;                  // what has a fraction or an exponent, or is larger
-      std::uint64_t count;            // of an array's or object's own values
+      std::uint64_t count;            // direct elements of an array or object
     };
-    std::uint32_t span = 1;  // nodes, with all that it holds
+    std::uint32_t span = 1;  // number of nodes: this one and all below it
     Kind kind = Kind::kNull;
-    // Places in the tree's text.
+    // Positions in text_.
     std::uint32_t keyBegin = 0;
     std::uint32_t keySize = 0;
     std::uint32_t textBegin = 0;
     std::uint32_t textSize = 0;
   };
 
-  // Below 4 GiB. When it fails, `words` say where and why, if the text is no JSON, and the tree is of no use.
-  [[nodiscard]] Failure parse(std::string_view text, std::string& words);
+  // `text` must be smaller than 4 GiB. After a failure the tree must not be used; if the text is not JSON,
+  // `message` says where and why.
+  [[nodiscard]] Failure parse(std::string_view text, std::string& message);
 
   const Node& root() const { return nodes_.front(); }
-  // Of a field of an object, otherwise empty.
+  // The key of an object's field; empty for other nodes.
   std::string_view keyOf(const Node& node) const { return textAt(node.keyBegin, node.keySize); }
-  // Of a text, otherwise empty.
+  // The value of a text node; empty for other nodes.
   std::string_view textOf(const Node& node) const { return textAt(node.textBegin, node.textSize); }
-  // The object's field of that name, the last one if there are several; null without such.
+  // The object's field with this key, or null. If several fields have the key, the last one counts.
   const Node* field(const Node& object, std::string_view key) const;
 
-  // The values that an array or object holds, in order:
+  // Iterates over the elements of an array or object in order:
   //   for (const Node* one = first(array); one != end(array); one = next(*one))
   static const Node* first(const Node& node) { return &node + 1; }
   static const Node* next(const Node& node) { return &node + node.span; }

@@ -14,7 +14,7 @@ using Json = nlohmann::ordered_json;
 
 constexpr int kMaxDepth = 200;
 
-// Where in a tree of values one stands, for words about it: "a.b[2]".
+// The path of the current value in a tree, for messages: "a.b[2]".
 class Path {
  public:
   std::string text() const { return text_.empty() ? "the value" : text_; }
@@ -46,13 +46,13 @@ class Path {
   int depth_ = 0;
 };
 
-// Writes straight into the text: a tree of the library's in between would cost several times as much, and a
-// session's file holds each of its messages.
+// Writes directly into the text, because a session's file holds all its messages: building the library's tree
+// first would cost several times as much.
 class PrettyWriter {
  public:
   explicit PrettyWriter(std::string& out) : out_(out) {}
 
-  // False when something cannot be said; problem() then names it.
+  // False if JSON cannot express a value; problem() then names it.
   bool write(const ValueMap& map) {
     return writeList('{', '}', map, [this](const ValueMap::Entry& entry, std::size_t) {
       appendCompactJson(out_, Value(entry.key));
@@ -60,7 +60,7 @@ class PrettyWriter {
       return write(entry.value) || isWithin(entry.key.string());
     });
   }
-  std::string problem() const { return place_ + " is " + unsaid_ + ", which JSON cannot say"; }
+  std::string problem() const { return place_ + " is " + inexpressible_ + ", which JSON cannot say"; }
 
  private:
   bool write(const Value& value) {
@@ -72,7 +72,7 @@ class PrettyWriter {
     }
     const double* number = value.asDouble();
     if (number != nullptr && !std::isfinite(*number)) {
-      unsaid_ = value.text();
+      inexpressible_ = value.text();
       return false;
     }
     appendCompactJson(out_, value);
@@ -100,7 +100,7 @@ class PrettyWriter {
     out_.append(indentation_, ' ');
   }
 
-  // On the way back out of what cannot be said: its place is within `part`. Always false.
+  // Prepends `part` to the path of the value that JSON cannot express. Always returns false.
   bool isWithin(const std::string& part) {
     const bool needsDot = !place_.empty() && place_.front() != '[';
     place_ = part + (needsDot ? "." : "") + place_;
@@ -109,8 +109,8 @@ class PrettyWriter {
 
   std::string& out_;
   std::size_t indentation_ = 0;
-  std::string place_;   // as "a.b[2]"
-  std::string unsaid_;  // "nan" or an infinity
+  std::string place_;          // path such as "a.b[2]"
+  std::string inexpressible_;  // the value: "nan" or an infinity
 };
 
 std::optional<Value> valueOf(const Json& json, Path& path, std::string& problem);
@@ -167,7 +167,7 @@ std::optional<Value> valueOf(const Json& json, Path& path, std::string& problem)
   }
 }
 
-// The library's words without the name of its exception in brackets.
+// The library's message without the exception's name in brackets.
 std::string messageOf(const Json::exception& error) {
   const std::string text = error.what();
   const std::size_t bracket = text.find("] ");

@@ -8,8 +8,8 @@
 
 namespace tonewerk {
 
-// A record as a map, an object within it as a map under its name. A byte string that is not UTF-8 shows its
-// bytes above 0x7F as "\xNN".
+// Formats a record as a map. A nested object becomes a map under its name. If a byte string is not UTF-8, its
+// bytes above 0x7F are written as "\xNN".
 class ValueMapFormatter final : public PB::TextFormatter {
  public:
   void beginObject(std::string_view name) override;
@@ -17,7 +17,7 @@ class ValueMapFormatter final : public PB::TextFormatter {
   void format(std::string_view name, std::string_view value) override;
   void endObject() override;
 
-  // What was formatted: the outermost objects under their names.
+  // The result: the outermost objects under their names.
   const ValueMap& map() const { return map_; }
 
  private:

@@ -19,7 +19,7 @@ bool ProtozeroReader::fail() {
   return false;
 }
 
-// The library's own message reader throws on groups, so the keys are read here.
+// Keys are read here because the library's message reader throws on groups.
 std::optional<PB::Reader::Key> ProtozeroReader::nextKey() {
   if (hasError_ || at_ == end_) return std::nullopt;
   const auto key = readVarint();
@@ -65,7 +65,7 @@ bool ProtozeroReader::skip(const Key& key, int groups) {
       return size && skipBytes(*size);
     }
     case PB::WireType::kEndGroup:
-      return fail();  // of a group that was not begun
+      return fail();  // no group is open
     case PB::WireType::kStartGroup:
       break;
   }

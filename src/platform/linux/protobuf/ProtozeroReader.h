@@ -7,13 +7,13 @@
 
 namespace tonewerk {
 
-// Reads protocol-buffer bytes. Fit for hostile input: nothing is allocated on a length's word, groups are
-// skipped to kMaxGroups deep.
+// Reads protocol-buffer bytes. Safe for hostile input: a length is checked before memory is allocated, and
+// groups are skipped only up to a depth of kMaxGroups.
 class ProtozeroReader final : public PB::Reader {
  public:
   static constexpr int kMaxGroups = 32;
 
-  // `bytes` outlives the reader.
+  // `bytes` must outlive the reader.
   explicit ProtozeroReader(std::string_view bytes) : at_(bytes.data()), end_(bytes.data() + bytes.size()) {}
 
   [[nodiscard]] std::optional<Key> nextKey() override;

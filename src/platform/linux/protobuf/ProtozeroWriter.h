@@ -7,7 +7,7 @@
 
 namespace tonewerk {
 
-// Collects protocol-buffer bytes.
+// Writes protocol-buffer bytes into a string.
 class ProtozeroWriter final : public PB::Writer {
  public:
   void writeVarint(std::uint32_t tag, std::uint64_t value) override;
