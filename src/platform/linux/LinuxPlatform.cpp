@@ -37,7 +37,7 @@
 namespace tonewerk {
 namespace {
 
-// As it is when the working directory is gone.
+// Returns `path` unchanged if the working directory does not exist any more.
 std::string absolutePath(const std::string& path) {
   std::error_code error;
   const std::filesystem::path absolute = std::filesystem::absolute(path, error);
@@ -108,7 +108,7 @@ DiagnosticsStore& LinuxPlatform::diagnostics() { return adapters_->diagnostics; 
 void LinuxPlatform::readConfigurationAgain() {
   adapters_->deviceFacts.readAgain();
   adapters_->preferences.checkAllFiles();
-  adapters_->notifications.tellEverything();  // what follows preferences looks at them then
+  adapters_->notifications.callAllHandlers();  // users of preferences read them again then
 }
 
 void LinuxPlatform::restoreRuntimeDirectory() { adapters_->notifications.makeDirectory(); }

@@ -13,10 +13,10 @@ class LinuxCapsa;
 struct Directories;
 struct Tracing;
 
-// One of each adapter, and the Platform made of them. Whoever makes it lets it outlive what uses the
-// Platform.
+// Owns one of each adapter and makes the Platform out of them. It must outlive all users of the Platform.
 //
-// The sinks are the caller's: their adapters need the clock, the log and the preferences from here.
+// The adapters of the sinks are not included: the caller creates them with the clock, the log and the
+// preferences of this object.
 class LinuxPlatform {
  public:
   explicit LinuxPlatform(const Directories& directories);
@@ -32,16 +32,17 @@ class LinuxPlatform {
   JsonService& json();
   FileSystem& files();
   AllocatorReclaimer& memory();
-  // Whoever ends the daemon finishes these, in this order, before what uses the Platform is gone.
+  // At the daemon's end, call finish() of these two, in this order, while the users of the Platform still
+  // exist.
   LinuxCapsa& capsa();
   DiagnosticsStore& diagnostics();
 
-  // Preferences and device facts are looked at again now: who reads them next finds them as they are.
+  // Reads preferences and device facts again now, so that later reads give their current values.
   void readConfigurationAgain();
-  // The runtime directory was made anew: what the adapters had in it is there again.
+  // Creates the adapters' directories in the runtime directory again. Call it after that was created again.
   void restoreRuntimeDirectory();
 
-  // The services handed in outlive what uses the result.
+  // The arguments must outlive all users of the result.
   Platform platform(Metricon& metricon, Energybook& energybook, Diagwire& diagwire, LinkReport& linkReport,
                     const Tracing& tracing);
 

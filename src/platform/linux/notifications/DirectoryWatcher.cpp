@@ -67,13 +67,13 @@ void DirectoryWatcher::run() {
   nameThisThread("tonewerk.watch");
   for (;;) {
     std::array<pollfd, 2> waited = {pollfd{stop_.get(), POLLIN, 0}, pollfd{inotify_.get(), POLLIN, 0}};
-    const bool mayHaveLinks = !unopened_.empty();
-    const int ready = poll(waited.data(), waited.size(), patience());
+    const bool hasPossibleLinks = !unopened_.empty();
+    const int ready = poll(waited.data(), waited.size(), pollTimeout());
     if (waited[0].revents != 0) return;
     if (ready > 0) {
       readEvents();
-    } else if (ready == 0 && mayHaveLinks) {
-      tellOfLinks();
+    } else if (ready == 0 && hasPossibleLinks) {
+      reportLinks();
     } else if (ready == 0) {
       attach();
       if (directoryWatch_ >= 0) onEverything_();
@@ -81,7 +81,7 @@ void DirectoryWatcher::run() {
   }
 }
 
-int DirectoryWatcher::patience() {
+int DirectoryWatcher::pollTimeout() {
   if (!unopened_.empty()) return 0;
   if (!mustRetry_) return -1;
   return static_cast<int>(std::chrono::duration_cast<std::chrono::milliseconds>(retry_.next()).count());
@@ -95,7 +95,7 @@ void DirectoryWatcher::readEvents() {
   while (at != end) {
     inotify_event raw{};
     std::memcpy(&raw, at, sizeof(raw));
-    const char* const name = at + sizeof(raw);  // with zeros behind it
+    const char* const name = at + sizeof(raw);  // padded with zeros
     handle({raw.wd, raw.mask, std::string_view(name, strnlen(name, raw.len))});
     at = name + raw.len;
   }
@@ -104,13 +104,13 @@ void DirectoryWatcher::readEvents() {
 void DirectoryWatcher::handle(const Event& event) {
   const bool isOverflow = (event.what & IN_Q_OVERFLOW) != 0;
   const bool isAncestor = event.watch == ancestorWatch_;
-  if (!isOverflow && !isAncestor && event.watch != directoryWatch_) return;  // of a watch given up since
+  if (!isOverflow && !isAncestor && event.watch != directoryWatch_) return;  // of a removed watch
 
   const bool isSelf = (event.what & (kSelfEvents | IN_IGNORED)) != 0;
-  // A changed mode matters only as long as the directory could not be read.
+  // A changed mode matters only while the directory cannot be read.
   const bool mayMatter = (event.what & IN_ATTRIB) == 0 || directoryWatch_ < 0;
   if (isOverflow || isSelf || (isAncestor && event.name == awaited_ && mayMatter)) {
-    // What was lost with an overflow may be a change of the directory itself.
+    // After an overflow, a lost event may have been one of the directory itself.
     attach();
     onEverything_();
     return;
@@ -121,7 +121,7 @@ void DirectoryWatcher::handle(const Event& event) {
 void DirectoryWatcher::handleFile(const Event& event) {
   const std::string name(event.name);
   if ((event.what & IN_CREATE) != 0) {
-    opened_.erase(name);  // another file's
+    opened_.erase(name);  // that was an earlier file with this name
     if (holdsSomething(directory_ + "/" + name)) unopened_.insert(name);
   } else if ((event.what & IN_OPEN) != 0) {
     if (unopened_.erase(name) > 0) opened_.insert(name);
@@ -130,11 +130,11 @@ void DirectoryWatcher::handleFile(const Event& event) {
   } else {
     unopened_.erase(name);
     opened_.erase(name);
-    if ((event.what & IN_MODIFY) == 0) onFile_(name);  // the others end a writing, or a move
+    if ((event.what & IN_MODIFY) == 0) onFile_(name);  // IN_CLOSE_WRITE or IN_MOVED_TO
   }
 }
 
-void DirectoryWatcher::tellOfLinks() {
+void DirectoryWatcher::reportLinks() {
   for (const std::string& name : std::exchange(unopened_, {})) {
     if (holdsSomething(directory_ + "/" + name)) onFile_(name);
   }
@@ -147,13 +147,13 @@ int DirectoryWatcher::watch(const std::string& path, std::uint32_t events, int& 
 }
 
 void DirectoryWatcher::attach() {
-  // Fails for one whose directory is gone; the kernel has removed it then.
+  // This fails if a watched directory is gone, because the kernel has removed its watch.
   for (const int old : {directoryWatch_, ancestorWatch_}) {
     if (old >= 0) inotify_rm_watch(inotify_.get(), old);
   }
   unopened_.clear();
   opened_.clear();
-  // The ancestor first, so that a directory which comes between the two is seen.
+  // The ancestor is watched first, so that a directory is noticed that is created between the two calls.
   const bool hasAncestor = watchAncestor();
   int failure = 0;
   directoryWatch_ = watch(directory_, kFileEvents | kSelfEvents, failure);
@@ -176,7 +176,7 @@ bool DirectoryWatcher::watchAncestor() {
       below = ancestor;
       continue;
     }
-    // What it is watched for may have come just before.
+    // The awaited directory may have been created just before the watch was added.
     std::error_code error;
     const bool isLate = below != directory_ && std::filesystem::is_directory(below, error);
     if (!isLate) return true;

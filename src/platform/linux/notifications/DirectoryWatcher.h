@@ -14,22 +14,22 @@
 
 namespace tonewerk {
 
-// Follows the files that are put into one directory, on a thread of its own.
+// Reports files that are written to or moved into one directory. It runs on a thread of its own.
 //
 //   closed after writing, renamed into place        -> onFile(name)
-//   linked into place: there and not empty          -> onFile(name)
+//   linked into place, and not empty                -> onFile(name)
 //   created, not yet closed after writing           -> nothing
 //   the kernel's event queue overflowed             -> onEverything()
-//   the directory came, or another took its place   -> onEverything()
+//   the directory was created or replaced           -> onEverything()
 //
-// The kernel tells a link like a creation. What tells them apart is that a file which somebody creates has
-// been opened before anything can be in it. So one that is not empty when its coming is read is a link if the
-// kernel has nothing more to say of it, or nothing but that it was opened and closed unwritten. Else it will
-// be closed after writing, and told of then.
+// The kernel sends the same event for a link as for a created file. But a created file must be opened before
+// anything can be written to it. So if a file is not empty when its creation event is read, it is taken for a
+// link, provided that the kernel has no further events of it, or only that it was opened and closed without
+// writing. Otherwise it will be closed after writing, and is reported then.
 //
-// The directory is known by its path. It need not be there: the nearest directory above it that is there is
-// watched for its coming, or for its becoming readable. Only where the system refuses that is it tried again,
-// at intervals that grow from a second to a minute.
+// The directory is identified by its path and need not exist. If it does not exist or cannot be read, the
+// nearest existing directory above it is watched until that changes. Only if the system refuses that, too,
+// the watcher tries again at intervals that grow from a second to a minute.
 class DirectoryWatcher {
  public:
   using FileHandler = std::function<void(std::string_view name)>;
@@ -37,53 +37,53 @@ class DirectoryWatcher {
   static constexpr std::chrono::milliseconds kFirstRetry{1'000};
   static constexpr std::chrono::milliseconds kLastRetry{60'000};
 
-  // What comes after the constructor's return is told. The handlers are called on the watcher's thread, one
-  // at a time; meanwhile events gather in the kernel. `log` outlives the watcher.
+  // Reports everything that happens after the constructor has returned. The handlers are called on the
+  // watcher's thread, one at a time; the kernel queues events meanwhile. `log` must outlive the watcher.
   DirectoryWatcher(std::string directory, FileHandler onFile, std::function<void()> onEverything,
                    const LogCategory& log);
   DirectoryWatcher(const DirectoryWatcher&) = delete;
   DirectoryWatcher& operator=(const DirectoryWatcher&) = delete;
-  // No handler runs any more when it returns.
+  // When it returns, no handler is running any more.
   ~DirectoryWatcher();
 
-  // False where the system refuses to watch anything; then nothing is ever told.
+  // False if the system has no inotify instance or eventfd left. Then no handler is ever called.
   bool isWorking() const { return stop_ && inotify_; }
 
  private:
   struct Event;
 
   void run();
-  // Reads what the kernel has gathered.
+  // Reads the events that the kernel has queued, and handles them.
   void readEvents();
   void handle(const Event& event);
   void handleFile(const Event& event);
-  // Those that nobody has open, when the kernel has nothing more to say.
-  void tellOfLinks();
-  // Watches what the paths lead to now, instead of what they led to before.
+  // Reports the files in unopened_. Called when the kernel's queue is empty.
+  void reportLinks();
+  // Replaces the watches by watches of the directories that the paths lead to now.
   void attach();
-  // Watches the nearest directory above that is there. False when there is none to be watched.
+  // Watches the nearest existing directory above. False if none can be watched.
   [[nodiscard]] bool watchAncestor();
   [[nodiscard]] int watch(const std::string& path, std::uint32_t events, int& failure);
   void noteProblem(int failure);
-  // How long poll() may wait, in milliseconds; -1 for ever.
-  int patience();
+  // poll()'s timeout in milliseconds; -1 for none.
+  int pollTimeout();
 
   const std::string directory_;
   const FileHandler onFile_;
   const std::function<void()> onEverything_;
   const LogCategory& log_;
-  const FileDescriptor stop_;  // becomes readable at the end
+  const FileDescriptor stop_;  // the destructor makes it readable
   const FileDescriptor inotify_;
 
-  // The watcher's thread, after the constructor.
+  // After the constructor, only the watcher's thread uses these.
   int directoryWatch_ = -1;
   int ancestorWatch_ = -1;
-  std::string awaited_;  // the way to the directory begins with this entry of the ancestor
-  // Files that came and were not empty, while it is not known whether they were linked or are being written.
-  std::set<std::string, std::less<>> unopened_;  // nobody has them open, as far as the kernel has said
-  std::set<std::string, std::less<>> opened_;    // somebody has
+  std::string awaited_;  // the ancestor's entry that is the first part of the path to the directory
+  // New files that are not empty, until it is known whether they were linked or are being written.
+  std::set<std::string, std::less<>> unopened_;  // not open, according to the events that were read
+  std::set<std::string, std::less<>> opened_;    // open, according to the events that were read
   bool mustRetry_ = false;
-  int problem_ = 0;  // the one last logged
+  int problem_ = 0;  // errno that was logged last; 0 for none
   GrowingDelay retry_{kFirstRetry, kLastRetry};
 
   std::thread thread_;  // last: it uses all above

@@ -12,7 +12,7 @@ namespace {
 constexpr unsigned kDirectoryMode = 0755;
 
 const std::string& made(const std::string& directory) {
-  // The watcher says what is wrong with it, and waits for it.
+  // If this fails, the watcher logs why it cannot watch the directory, and waits for it.
   static_cast<void>(LinuxFileSystem().createDirectories(directory, kDirectoryMode));
   return directory;
 }

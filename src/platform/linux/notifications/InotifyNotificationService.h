@@ -11,35 +11,35 @@
 
 namespace tonewerk {
 
-// Named notifications over the files of one directory, watched with inotify.
+// Delivers named notifications through the files of one directory, which it watches with inotify.
 //
-// Where posts may have been missed (the kernel's event queue overflowed, or the directory was replaced or
-// came anew) every registered handler is told, as if each name had been posted: a post too many costs a look
-// at an unchanged state, one too few leaves a stale one standing. A removed file is no post; its state is 0
-// from then on.
+// When posts may have been missed (the kernel's event queue overflowed, or the directory was replaced or
+// created again), every registered handler is called as if each name had been posted. An unnecessary call
+// costs one read of an unchanged state; a missing call would leave an old state in use. Removing a file is
+// not a post; the state is 0 from then on.
 //
-// A post just before a registration may still be told to it.
+// A handler may also be called for a post from just before its registration.
 class InotifyNotificationService final : public NotificationService {
  public:
-  // Makes the directory; where that fails it may come later. `log` outlives the service.
+  // Creates the directory. If that fails, it may be created later. `log` must outlive the service.
   InotifyNotificationService(const std::string& directory, const LogCategory& log);
 
-  // Fails with kStatusInvalidName, and with kStatusFailed where the system has no inotify left.
+  // Fails with kStatusInvalidName, or with kStatusFailed if the system has no inotify instance left.
   [[nodiscard]] Registration registerHandler(std::string_view name, SerialQueue& queue,
                                              std::function<void(Token)> handler) override;
   [[nodiscard]] std::optional<std::uint64_t> state(Token token) const override;
   void cancel(Token token) override;
   [[nodiscard]] std::error_code post(std::string_view name) override;
 
-  // Makes the directory again, where it went with all around it.
+  // Creates the directory again, with the directories above it, after they were removed.
   void makeDirectory();
-  // Every registered handler is told.
-  void tellEverything() { handlers_.tellAll(); }
+  // Calls every registered handler.
+  void callAllHandlers() { handlers_.tellAll(); }
 
  private:
   const NotificationFiles files_;
   NotificationHandlers handlers_;
-  DirectoryWatcher watcher_;  // last: it tells the handlers
+  DirectoryWatcher watcher_;  // last: it calls the handlers
 };
 
 }  // namespace tonewerk

@@ -23,10 +23,10 @@ namespace {
 constexpr mode_t kFileMode = 0644;
 constexpr unsigned kDirectoryMode = 0755;
 
-// Others may put anything in a file's place: a pipe must not hold us, a link must not lead us away.
+// Other users may put anything at a file's path: a pipe must not block us, and a link must not be followed.
 constexpr int kCareful = O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC;
 
-// Opened only where it is a regular file.
+// Fails if `path` is not a regular file.
 FileDescriptor openRegularFile(const std::string& path, int flags, std::error_code& error) {
   FileDescriptor file(open(path.c_str(), flags | kCareful));
   struct stat status {};
@@ -50,7 +50,7 @@ std::optional<std::uint64_t> parseState(std::string_view text) {
   return rest.find_first_not_of(kSpaces) == std::string_view::npos ? std::optional(state) : std::nullopt;
 }
 
-// As much of the file as `buffer` takes.
+// Reads at most as many bytes as fit into `buffer`.
 std::string_view readInto(std::array<char, NotificationFiles::kMaxStateBytes + 1>& buffer, int file,
                           std::error_code& error) {
   std::size_t size = 0;
@@ -64,7 +64,7 @@ std::string_view readInto(std::array<char, NotificationFiles::kMaxStateBytes + 1
   return {buffer.data(), size};
 }
 
-// A name that no other writer uses.
+// A file name that no other writer uses.
 std::string temporaryName() {
   static std::atomic<unsigned> count = 0;
   return ".new-" + std::to_string(getpid()) + "-" + std::to_string(++count);
@@ -74,11 +74,11 @@ std::error_code writeNewFile(const std::string& directory, const std::string& pa
   const FileDescriptor parent(open(directory.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC));
   const FileDescriptor file(open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | kCareful, kFileMode));
   if (!parent || !file) return lastSystemError();
-  // The daemon posts, too, for which it opens the file for writing.
+  // The daemon must be able to open the file for writing, because it posts, too.
   if (const std::error_code error = giveToOwnerOf(parent.get(), file.get())) return error;
   const ssize_t written = write(file.get(), text.data(), text.size());
   if (written < 0) return lastSystemError();
-  // So few bytes are written at once or not at all.
+  // A short write of so few bytes means that the disk is full.
   return written == static_cast<ssize_t>(text.size()) ? std::error_code()
                                                       : std::make_error_code(std::errc::no_space_on_device);
 }
@@ -110,7 +110,7 @@ std::error_code NotificationFiles::put(std::uint64_t state, Place place) const {
   std::error_code error = LinuxFileSystem().createDirectories(directory_, kDirectoryMode);
   if (error) return error;
   const std::string path = pathOf(temporaryName());
-  // What a crash left behind.
+  // A crash may have left a file with this name.
   unlink(path.c_str());
   error = writeNewFile(directory_, path, std::to_string(state) + "\n");
   if (!error && place(path.c_str()) != 0) error = lastSystemError();
@@ -122,11 +122,12 @@ std::error_code NotificationFiles::post(std::string_view name) const {
   if (!NotificationHandlers::isName(name)) return std::make_error_code(std::errc::invalid_argument);
   const std::string path = pathOf(name);
   std::error_code error;
-  // Closing a file that was opened for writing is a post and leaves what others wrote meanwhile alone.
+  // Closing a file that was opened for writing is a post. It keeps a state that another writer sets
+  // meanwhile.
   if (openRegularFile(path, O_WRONLY, error)) return {};
   if (error != std::errc::no_such_file_or_directory) return error;
   error = put(0, [&](const char* made) { return link(made, path.c_str()); });
-  // Somebody was faster: their post is ours.
+  // Another process created the file meanwhile. That was a post of the same name.
   return error == std::errc::file_exists ? std::error_code() : error;
 }
 

@@ -9,35 +9,37 @@
 
 namespace tonewerk {
 
-// The files of named notifications: one a name in one directory, holding its 64-bit state in decimal. A file
-// that is closed after writing, renamed or linked into place is a post.
+// Reads and writes the files of named notifications. One directory holds one file for each name, with the
+// name's 64-bit state in decimal. A post is a file that is closed after writing, or renamed or linked into
+// place.
 //
-// Names as NotificationService has them; others are refused with std::errc::invalid_argument. Nothing outside
-// the directory is ever read or written: links in place of files are not followed. Any thread, any process.
+// The names are those that NotificationService accepts; others fail with std::errc::invalid_argument. Nothing
+// outside the directory is read or written, because symbolic links are not followed. Any thread of any
+// process may use the files.
 class NotificationFiles {
  public:
-  // Spaces around the number included.
+  // Includes spaces around the number.
   static constexpr std::size_t kMaxStateBytes = 64;
 
   explicit NotificationFiles(std::string directory) : directory_(std::move(directory)) {}
 
   const std::string& directory() const { return directory_; }
 
-  // The name's state. Fails with std::errc::no_such_file_or_directory where there is no file, with
-  // std::errc::result_out_of_range for one that holds no number of 64 bits, or too much, and with
-  // std::errc::invalid_argument for what is no regular file.
+  // The name's state. Fails with std::errc::no_such_file_or_directory if there is no file, with
+  // std::errc::result_out_of_range if it does not hold a 64-bit number or is longer than kMaxStateBytes, and
+  // with std::errc::invalid_argument if it is not a regular file.
   [[nodiscard]] std::optional<std::uint64_t> state(std::string_view name, std::error_code& error) const;
 
-  // Posts the name with the state it has, whatever its file holds; a name without a file gets the state 0.
-  // These two make the directory where it is missing. What root makes belongs to whom the directory around it
-  // belongs to.
+  // Posts the name and keeps its state; the contents of its file do not matter. A name without a file gets
+  // the state 0. Both post() functions create a missing directory. When the process is root, everything they
+  // create gets the owner of the directory that contains it.
   [[nodiscard]] std::error_code post(std::string_view name) const;
-  // Posts the name with a new state. Readers see the old file or the new one.
+  // Posts the name with a new state. Readers see either the old file or the new one.
   [[nodiscard]] std::error_code post(std::string_view name, std::uint64_t state) const;
 
  private:
   std::string pathOf(std::string_view name) const;
-  // Writes a file of its own name, and then lets `place` give it the right one.
+  // Writes a file with a temporary name and then calls `place` to give it its final name.
   template <typename Place>
   [[nodiscard]] std::error_code put(std::uint64_t state, Place place) const;
 

@@ -8,11 +8,11 @@ namespace tonewerk {
 
 class TomlPreferenceStore;
 
-// Has the store look at a preference file whenever somebody has written it, so that one that does not parse
-// is logged while its writer still looks at it. What is there at the start is looked at, too.
+// Lets the store check each preference file after it was written. So a file that cannot be parsed is logged
+// at once, while its author is still working on it. The files that exist at the start are checked, too.
 class PreferenceWatcher {
  public:
-  // Both outlive the watcher.
+  // Both must outlive the watcher.
   PreferenceWatcher(const TomlPreferenceStore& store, const LogCategory& log);
 
  private:

@@ -10,11 +10,11 @@
 
 namespace tonewerk {
 
-// Facts out of a TOML file, read when it is made and when somebody asks for it. A missing file states none;
-// one that does not parse is logged and states none.
+// Reads device facts from a TOML file: in the constructor, and again in readAgain(). A missing file states no
+// facts. A file that cannot be parsed is logged and states no facts either. Any thread.
 class TomlDeviceFacts final : public DeviceFacts {
  public:
-  // `log` outlives the facts.
+  // `log` must outlive this object.
   TomlDeviceFacts(std::string path, const LogCategory& log);
 
   [[nodiscard]] std::optional<bool> boolean(std::string_view property) const override;

@@ -38,9 +38,9 @@ void TomlFile::read() {
 
 void TomlFile::fail(const std::string& problem, const std::optional<FileStamp>& found) {
   values_ = {};
-  if (problem == problem_ && found == saidOf_) return;
+  if (problem == problem_ && found == loggedStamp_) return;
   problem_ = problem;
-  saidOf_ = found;
+  loggedStamp_ = found;
   errorLog(log_, "%s (read as empty)", problem_);
 }
 

@@ -11,32 +11,32 @@
 
 namespace tonewerk {
 
-// One TOML file that others may rewrite at any time, and what was last read from it. One thread at a time.
+// Holds the values of one TOML file that other processes may rewrite at any time. One thread at a time.
 class TomlFile {
  public:
-  // `log` outlives the file.
+  // `log` must outlive this object.
   TomlFile(std::string path, const LogCategory& log) : path_(std::move(path)), log_(log) {}
 
-  // Looks at the file, and reads it unless it is for certain the one that was read last. A file that cannot
-  // be read or does not parse is logged with line and column, once until it is written again.
+  // Reads the file again, unless it certainly has not changed. A file that cannot be read or parsed is logged
+  // once, with line and column, until it is written again.
   void refresh();
 
-  // As of the last refresh(). Empty when there is no such file and when problem() says why it cannot be read.
+  // The values at the last refresh(). Empty if there is no file, or if problem() says why it cannot be read.
   const ValueMap& values() const { return values_; }
   const std::string& problem() const { return problem_; }
   const std::string& path() const { return path_; }
 
  private:
   void read();
-  // `found` is the file that has the problem, none where it could not be opened.
+  // `found` is the stamp of the file that has the problem; none if it could not be opened.
   void fail(const std::string& problem, const std::optional<FileStamp>& found);
 
   const std::string path_;
   const LogCategory& log_;
-  std::optional<FileStamp> stamp_;  // of what was read; none when it cannot be trusted to tell a later state
+  std::optional<FileStamp> stamp_;  // of the file that was read; none if a change might not alter the stamp
   ValueMap values_;
   std::string problem_;
-  std::optional<FileStamp> saidOf_;  // the file whose problem was logged last
+  std::optional<FileStamp> loggedStamp_;  // of the file whose problem was logged last
 };
 
 }  // namespace tonewerk

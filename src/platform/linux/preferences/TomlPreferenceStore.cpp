@@ -29,8 +29,8 @@ bool isDomain(std::string_view domain) {
 
 std::string fileNameOf(std::string_view domain) { return std::string(domain) + std::string(kEnding); }
 
-// Stricter than ==, for which 1, 1.0 and true are equal: a value is only left out of the written file when
-// the configuration says the very same.
+// Also compares the types: for == the values 1, 1.0 and true are equal. A value is left out of the written
+// file only if the configuration has the same value of the same type.
 bool isSame(const Value& a, const Value& b) {
   if (a.kind() != b.kind()) return false;
   if (const ValueArray* array = a.asArray()) {
@@ -45,7 +45,7 @@ bool isSame(const Value& a, const Value& b) {
          });
 }
 
-// As the value will be read back; none when TOML cannot say it.
+// The value as it will be read back; none if TOML cannot express it.
 std::optional<Value> asStored(const Value& value, std::string& problem) {
   const std::optional<std::string> text = tomlText(ValueMap{{"value", value}}, problem);
   const std::optional<ValueMap> stored = text ? parseToml(*text, problem) : std::nullopt;
@@ -53,14 +53,14 @@ std::optional<Value> asStored(const Value& value, std::string& problem) {
   return *stored->find("value");
 }
 
-void leaveOutWhatIsConfigured(ValueMap& written, const ValueMap& configured) {
+void removeConfiguredValues(ValueMap& written, const ValueMap& configured) {
   for (const ValueMap::Entry& entry : configured) {
     const Value* own = written.find(entry.key);
     if (own != nullptr && isSame(*own, entry.value)) written.erase(entry.key);
   }
 }
 
-// The lock file, made where it is missing.
+// Opens the lock file. Creates it if it does not exist.
 FileDescriptor openLock(const std::string& directory, std::error_code& error) {
   constexpr const char* kName = ".lock";
   constexpr int kFlags = O_RDWR | O_NOFOLLOW | O_CLOEXEC;
@@ -73,7 +73,7 @@ FileDescriptor openLock(const std::string& directory, std::error_code& error) {
   return FileDescriptor(openat(parent.get(), kName, kFlags));
 }
 
-// Held by one writer at a time, of whatever process. Let go when the file is closed.
+// Locks out all other writers in this and other processes. Closing the file releases the lock.
 FileDescriptor lockWriters(const std::string& directory, std::error_code& error) {
   FileDescriptor lock = openLock(directory, error);
   if (error) return {};
@@ -119,7 +119,7 @@ void TomlPreferenceStore::checkFile(std::string_view fileName) const {
 
 void TomlPreferenceStore::checkAllFiles() const {
   for (const std::string& directory : {configurationDirectory_, stateDirectory_}) {
-    std::error_code error;  // there may be none
+    std::error_code error;  // the directory need not exist
     std::filesystem::directory_iterator entry(directory, error);
     for (const std::filesystem::directory_iterator end; !error && entry != end; entry.increment(error)) {
       checkFile(entry->path().filename().string());
@@ -204,7 +204,7 @@ std::error_code TomlPreferenceStore::update(std::string_view domain, std::string
 std::error_code TomlPreferenceStore::store(std::string_view domain, const Contents& contents,
                                            std::string& problem) const {
   ValueMap differing = contents.written;
-  leaveOutWhatIsConfigured(differing, contents.configured);
+  removeConfiguredValues(differing, contents.configured);
   const std::optional<std::string> text = tomlText(differing, problem);
   if (!text) return std::make_error_code(std::errc::result_out_of_range);
   const std::error_code error = replaceFile(stateDirectory_, fileNameOf(domain), *text);

@@ -11,25 +11,27 @@
 
 namespace tonewerk {
 
-// Preferences as TOML files, one a domain: <configuration directory>/<domain>.toml, overlaid key by key by
-// <state directory>/<domain>.toml. Only the latter is written, and holds only what differs from the former.
+// Stores preferences in TOML files. Each domain has two: <configuration directory>/<domain>.toml and <state
+// directory>/<domain>.toml. A key in the second file overrides the same key in the first. The store writes
+// only the second file, and only the values that differ from the first. Any thread.
 //
-// A read looks at both files (two stat() calls) and reads what changed. A write holds a lock file, so that no
-// writer in this or another process loses another's keys, and ends after the new file is on the disk. What
-// root makes belongs to whom the directory around it belongs to, so that the daemon can go on writing there.
+// A read checks both files with stat() and reads those that have changed. A write holds a lock on a lock
+// file, so that concurrent writers in this and other processes do not lose each other's keys. It returns
+// after the new file is on the disk. When the process is root, new files get the owner of their directory, so
+// that the daemon can still write there.
 //
-// A file that does not parse is read as empty. If it is the written one, writes to its domain fail
-// (std::errc::invalid_argument) until somebody has mended or removed it.
+// A file that cannot be parsed is read as empty. If it is the file in the state directory, writes to its
+// domain fail with std::errc::invalid_argument until somebody has corrected or removed the file.
 //
-// A domain that is no plain file name (empty, with a slash, beginning with a dot) holds nothing and is
-// refused for writing with std::errc::invalid_argument; a value that TOML cannot say with
-// std::errc::result_out_of_range.
+// A domain must be a plain file name: not empty, without a slash, and not beginning with a dot. Otherwise it
+// has no values, and writing fails with std::errc::invalid_argument. Writing a value that TOML cannot express
+// fails with std::errc::result_out_of_range.
 class TomlPreferenceStore final : public PreferenceStore {
  public:
-  // The directories need not exist; the second is made when something is written. `log` outlives the store.
+  // The directories need not exist; the first write creates the second. `log` must outlive the store.
   TomlPreferenceStore(std::string configurationDirectory, std::string stateDirectory, const LogCategory& log);
 
-  // What the configuration says of a domain, and what was written over it.
+  // A domain's values in the configuration directory and in the state directory.
   struct Layers {
     ValueMap configured;
     ValueMap written;
@@ -43,8 +45,8 @@ class TomlPreferenceStore final : public PreferenceStore {
   [[nodiscard]] std::error_code remove(std::string_view domain, std::string_view key,
                                        std::string* problem = nullptr) override;
 
-  // Read their files where they changed, so that what is wrong with them is logged now and not when somebody
-  // needs them. A name that is no preference file's is nobody's.
+  // Read one file, or all files, again if they have changed, so that their problems are logged now and not at
+  // the next use. A name that is not that of a preference file is ignored.
   void checkFile(std::string_view fileName) const;
   void checkAllFiles() const;
 
@@ -56,14 +58,14 @@ class TomlPreferenceStore final : public PreferenceStore {
     TomlFile configured;
     TomlFile written;
   };
-  // What both files hold at this moment.
+  // The current contents of both files.
   struct Contents {
     ValueMap configured;
     ValueMap written;
     std::string problem;  // why `written` must not be overwritten
   };
   Contents contentsOf(std::string_view domain) const;
-  // Runs `change` on the domain's contents under the writers' lock, and stores what it leaves in `written`.
+  // Holds the writers' lock, calls `change` with the domain's contents and then stores `written`.
   template <typename Change>
   [[nodiscard]] std::error_code update(std::string_view domain, std::string* problem, Change change);
   [[nodiscard]] std::error_code store(std::string_view domain, const Contents& contents,
@@ -72,7 +74,7 @@ class TomlPreferenceStore final : public PreferenceStore {
   const std::string configurationDirectory_;
   const std::string stateDirectory_;
   const LogCategory& log_;
-  mutable Mutex mutex_;  // not held while a writer waits for the disk
+  mutable Mutex mutex_;  // not held while a writer writes to the disk
   mutable std::map<std::string, Domain, std::less<>> domains_ GUARDED_BY(mutex_);
 };
 

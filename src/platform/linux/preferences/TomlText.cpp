@@ -23,7 +23,7 @@ Date dateOf(const toml::date_time& time) {
   return Date{static_cast<double>(seconds) + time.time.nanosecond / 1e9};
 }
 
-bool canBeSaid(Date date) {
+bool isTomlDate(Date date) {
   constexpr double kFirst = -62167219200.0;  // 0000-01-01T00:00:00Z
   constexpr double kEnd = 253402300800.0;    // 10000-01-01T00:00:00Z
   return date.seconds >= kFirst && date.seconds < kEnd;
@@ -60,13 +60,13 @@ ValueMap valuesOf(const toml::table& table) {
   return map;
 }
 
-// Writes values as TOML, nested tables and arrays on the line of their key.
+// Writes values as TOML, with nested tables and arrays on the line of their key.
 //
-// Of our own, because the library's writer does not escape every key.
+// The library's writer is not used, because it does not escape every key.
 class TomlWriter {
  public:
   const std::string& text() const { return text_; }
-  // What could not be said; empty when all could.
+  // Names a value that TOML cannot express; empty if there is none.
   const std::string& problem() const { return problem_; }
 
   void writeLines(const ValueMap& map) {
@@ -128,18 +128,18 @@ class TomlWriter {
   void writeDouble(double number) {
     const std::string digits = textOf(number);
     text_ += digits;
-    // "2" would be an integer; "nan" and "inf" have a letter that no number has.
+    // "2" would be read as an integer. "nan" and "inf" must stay as they are; both have an "n".
     if (digits.find_first_of(".en") == std::string::npos) text_ += ".0";
   }
 
   void writeDate(Date date) {
-    if (!canBeSaid(date)) {
+    if (!isTomlDate(date)) {
       problem_ = "TOML's dates are those of the years 0 to 9999";
       return;
     }
     const double whole = std::floor(date.seconds);
     const long long nanoseconds = std::min(std::llround((date.seconds - whole) * 1e9), 999'999'999LL);
-    std::array<char, 24> fraction{};  // any long long: the compiler does not see the bounds
+    std::array<char, 24> fraction{};  // fits any long long, because the compiler does not know the bounds
     std::snprintf(fraction.data(), fraction.size(), ".%09lldZ", nanoseconds);
     text_ += textOf(Date{whole});
     if (nanoseconds == 0) return;
@@ -205,8 +205,8 @@ std::optional<std::string> tomlText(const ValueMap& map, std::string& problem) {
   writer.writeLines(map);
   problem = writer.problem();
   if (!problem.empty()) return std::nullopt;
-  // What cannot be read again (texts that are no UTF-8, values nested too deeply) would lose everything else
-  // in the file, too.
+  // If a value could not be read again (a text that is not UTF-8, or values nested too deeply), all other
+  // values in the file would be lost, too.
   std::string unreadable;
   const std::optional<ValueMap> readBack = parseToml(writer.text(), unreadable);
   if (readBack && *readBack == map) return writer.text();
@@ -215,7 +215,7 @@ std::optional<std::string> tomlText(const ValueMap& map, std::string& problem) {
 }
 
 std::optional<Value> parseTomlValue(std::string_view text) {
-  // A line break would let the text say more than one value.
+  // After a line break, the text could contain a second key.
   if (text.find_first_of("\r\n") != std::string_view::npos) return std::nullopt;
   std::string problem;
   const std::optional<ValueMap> parsed = parseToml("value = " + std::string(text), problem);
