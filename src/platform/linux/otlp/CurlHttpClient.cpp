@@ -14,14 +14,14 @@ constexpr std::size_t kMaxHeaderBytes = std::size_t{64} << 10;
 constexpr std::string_view kRetryAfter = "retry-after:";
 constexpr int kPollMilliseconds = 1000;
 
-// Once in the process, before any other use.
+// libcurl must be initialised once in the process, before any other use.
 bool startLibrary() {
   static const bool isStarted = curl_global_init(CURL_GLOBAL_DEFAULT) == CURLE_OK;
   return isStarted;
 }
 
-// What arrives, up to its bounds.
-struct Arrival {
+// Receives an answer up to its size limits.
+struct Receiver {
   HttpAnswer& answer;
   std::size_t headerBytes = 0;
 };
@@ -30,18 +30,18 @@ bool beginsWithName(std::string_view line, std::string_view name) {
   return line.size() >= name.size() && strncasecmp(line.data(), name.data(), name.size()) == 0;
 }
 
-// Taking less than was offered ends the transfer.
+// Returning fewer bytes than given ends the transfer.
 std::size_t takeHeader(char* data, std::size_t size, std::size_t count, void* held) {
-  auto& arrival = *static_cast<Arrival*>(held);
+  auto& receiver = *static_cast<Receiver*>(held);
   const std::string_view line(data, size * count);
-  arrival.headerBytes += line.size();
-  if (arrival.headerBytes > kMaxHeaderBytes) return 0;
-  if (beginsWithName(line, kRetryAfter)) arrival.answer.retryAfter = line.substr(kRetryAfter.size());
+  receiver.headerBytes += line.size();
+  if (receiver.headerBytes > kMaxHeaderBytes) return 0;
+  if (beginsWithName(line, kRetryAfter)) receiver.answer.retryAfter = line.substr(kRetryAfter.size());
   return line.size();
 }
 
 std::size_t takeBody(char* data, std::size_t size, std::size_t count, void* held) {
-  std::string& body = static_cast<Arrival*>(held)->answer.body;
+  std::string& body = static_cast<Receiver*>(held)->answer.body;
   const std::size_t bytes = size * count;
   const std::size_t room = HttpAnswer::kMaxBodyBytes - body.size();
   if (bytes > room) {
@@ -56,7 +56,7 @@ class HeaderList {
  public:
   explicit HeaderList(const std::vector<std::string>& headers) {
     for (const std::string& header : headers) append(header.c_str());
-    append("Expect:");  // a body is sent without asking first
+    append("Expect:");  // send the body without waiting for "100 Continue"
   }
   HeaderList(const HeaderList&) = delete;
   HeaderList& operator=(const HeaderList&) = delete;
@@ -94,7 +94,7 @@ struct CurlHttpClient::Handles {
     if (multi != nullptr) curl_multi_cleanup(multi);
   }
 
-  // Until the transfer is over or cancelled.
+  // Returns when the transfer has ended or was cancelled.
   CURLcode run(const std::atomic<bool>& isCancelled) const {
     if (curl_multi_add_handle(multi, easy) != CURLM_OK) return CURLE_FAILED_INIT;
     CURLcode result = CURLE_ABORTED_BY_CALLBACK;
@@ -131,13 +131,13 @@ HttpAnswer CurlHttpClient::post(const HttpRequest& request) {
     return answer;
   }
   const HeaderList headers(request.headers);
-  Arrival arrival{answer};
+  Receiver receiver{answer};
   curl_easy_reset(easy);
   curl_easy_setopt(easy, CURLOPT_URL, request.url.c_str());
   curl_easy_setopt(easy, CURLOPT_PROTOCOLS_STR, "http,https");
   curl_easy_setopt(easy, CURLOPT_FOLLOWLOCATION, 0L);
   curl_easy_setopt(easy, CURLOPT_NOSIGNAL, 1L);
-  curl_easy_setopt(easy, CURLOPT_QUICK_EXIT, 1L);  // a name server that hangs does not hold up the end
+  curl_easy_setopt(easy, CURLOPT_QUICK_EXIT, 1L);  // do not wait for a name server at the end
   curl_easy_setopt(easy, CURLOPT_CONNECTTIMEOUT_MS, static_cast<long>(timeouts_.connect.count()));
   curl_easy_setopt(easy, CURLOPT_TIMEOUT_MS, static_cast<long>(timeouts_.whole.count()));
   curl_easy_setopt(easy, CURLOPT_USERAGENT, userAgent_.c_str());
@@ -146,14 +146,14 @@ HttpAnswer CurlHttpClient::post(const HttpRequest& request) {
   curl_easy_setopt(easy, CURLOPT_POSTFIELDS, request.body.data());
   curl_easy_setopt(easy, CURLOPT_POSTFIELDSIZE_LARGE, static_cast<curl_off_t>(request.body.size()));
   curl_easy_setopt(easy, CURLOPT_HEADERFUNCTION, &takeHeader);
-  curl_easy_setopt(easy, CURLOPT_HEADERDATA, &arrival);
+  curl_easy_setopt(easy, CURLOPT_HEADERDATA, &receiver);
   curl_easy_setopt(easy, CURLOPT_WRITEFUNCTION, &takeBody);
-  curl_easy_setopt(easy, CURLOPT_WRITEDATA, &arrival);
+  curl_easy_setopt(easy, CURLOPT_WRITEDATA, &receiver);
 
   const CURLcode result = handles_->run(isCancelled_);
   long status = 0;
   curl_easy_getinfo(easy, CURLINFO_RESPONSE_CODE, &status);
-  // An interim status is no answer yet.
+  // A status below 200 is not the final one.
   answer.status = status < 200 ? 0 : static_cast<int>(status);
   if (result != CURLE_OK) answer.problem = curl_easy_strerror(result);
   return answer;

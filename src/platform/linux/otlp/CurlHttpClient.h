@@ -10,7 +10,8 @@
 
 namespace tonewerk {
 
-// HTTP by libcurl: connections are kept, certificates verified, only http and https spoken.
+// Sends HTTP requests with libcurl. It reuses connections, verifies certificates, and supports only http and
+// https.
 class CurlHttpClient final : public HttpClient {
  public:
   struct Timeouts {
@@ -36,8 +37,8 @@ class CurlHttpClient final : public HttpClient {
   std::atomic<bool> isCancelled_ = false;
 };
 
-// "<base>/v1/logs" for the base address of an endpoint, which is an http or https URL with a host and neither
-// user, query nor fragment. Empty, with a problem, for anything else.
+// The URL "<base>/v1/logs" for the base address of an endpoint. The base must be an http or https URL with a
+// host and without user, password, query and fragment; otherwise the result is empty and `problem` says why.
 [[nodiscard]] std::string otlpLogsAddressOf(const std::string& base, std::string& problem);
 
 }  // namespace tonewerk

@@ -6,7 +6,7 @@
 namespace tonewerk {
 namespace {
 
-constexpr int kGzipWindowBits = 15 + 16;  // the largest window, and gzip's header around it
+constexpr int kGzipWindowBits = 15 + 16;  // the largest window; 16 selects gzip's header
 constexpr int kMemoryLevel = 8;
 
 }  // namespace

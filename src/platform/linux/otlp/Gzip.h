@@ -7,7 +7,7 @@
 
 namespace tonewerk {
 
-// `text` in gzip's format; none when there is no memory for it.
+// Compresses `text` in gzip's format; none if there is not enough memory.
 [[nodiscard]] std::optional<std::string> gzip(std::string_view text);
 
 }  // namespace tonewerk

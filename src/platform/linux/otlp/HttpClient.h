@@ -14,16 +14,16 @@ struct HttpRequest {
 };
 
 struct HttpAnswer {
-  // What a body is read up to; the rest is not waited for.
+  // A body is read up to this size; then the transfer ends.
   static constexpr std::size_t kMaxBodyBytes = std::size_t{64} << 10;
 
-  int status = 0;          // 0 when there was none
-  std::string problem;     // why there was none, or why the body is not whole; else empty
+  int status = 0;          // 0 without an answer
+  std::string problem;     // why there is no answer, or why the body is incomplete; otherwise empty
   std::string retryAfter;  // the header's value, empty without it
   std::string body;
 };
 
-// Posts to HTTP servers that may be down, slow or hostile.
+// Posts requests to HTTP servers, which may be down, slow or hostile.
 class HttpClient {
  public:
   virtual ~HttpClient() = default;
@@ -31,7 +31,7 @@ class HttpClient {
   // One thread at a time. Waits for the answer, within the client's time-outs. Never follows a redirection.
   [[nodiscard]] virtual HttpAnswer post(const HttpRequest& request) = 0;
 
-  // Any thread. Ends a post() that is running; it and those that follow have no answer.
+  // Any thread. Ends a running post(). That call and all later ones return without an answer.
   virtual void cancel() = 0;
 };
 

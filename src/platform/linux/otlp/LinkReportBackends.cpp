@@ -36,7 +36,7 @@ void LinkReportBackends::add(const std::string& entry) {
     local = true;
     return;
   }
-  // A password does not get into the log.
+  // An entry with an '@' is not logged, because it may contain a password.
   const std::string shown = entry.find('@') == std::string::npos ? "\"" + entry + "\"" : "an entry";
   std::string problem;
   const std::string url = otlpLogsAddressOf(entry, problem);

@@ -9,8 +9,9 @@
 
 namespace tonewerk {
 
-// Where real-time-communication messages go: what the preference "backends" of the domain
-// "com.orvane.linkreport" says, an array of texts: "local", or the base address of an OTLP/HTTP endpoint.
+// Lists the destinations of real-time-communication messages. They come from the preference "backends" of the
+// domain "com.orvane.linkreport": an array of texts, each "local" or the base address of an OTLP/HTTP
+// endpoint.
 struct LinkReportBackends {
   static constexpr std::size_t kMaxEndpoints = 8;
 
@@ -21,12 +22,12 @@ struct LinkReportBackends {
 
   bool local = false;
   std::vector<Endpoint> endpoints;
-  std::vector<std::string> problems;  // what was left out and why
+  std::vector<std::string> problems;  // entries that were left out, and why
 
-  // Without the preference "local" alone.
+  // Without the preference, "local" is the only backend.
   static LinkReportBackends from(const std::optional<Value>& preference);
 
-  // In the order of the preference, "local" first. None without any.
+  // "local" first, then the endpoints in the order of the preference. None without backends.
   [[nodiscard]] std::optional<std::vector<std::string>> names() const;
 
  private:

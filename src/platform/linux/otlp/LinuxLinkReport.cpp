@@ -19,7 +19,7 @@ namespace {
 
 constexpr const char* kServiceName = "com.orvane.tonewerk";
 
-// Exporters that sessions once used stay, also when the preference names others later.
+// Exporters stay until the end, even if the preference no longer names their endpoints.
 constexpr std::size_t kMaxExporters = 2 * LinkReportBackends::kMaxEndpoints;
 
 std::function<double()> systemJitter() {
@@ -103,7 +103,7 @@ class LinuxLinkReport::Session final : public LinkReportSession {
   const std::string eventName_;
   const std::shared_ptr<RtcSessionRecord> stored_;
   bool isLocal_ = false;
-  std::vector<OtlpExporter*> exporters_;  // the service's
+  std::vector<OtlpExporter*> exporters_;  // owned by the service
   bool repeatsEventName_ = false;
 };
 
@@ -120,7 +120,7 @@ LinuxLinkReport::LinuxLinkReport(ReportStore& store, const PreferenceStore& pref
 
 LinuxLinkReport::~LinuxLinkReport() = default;
 
-// The parent's place is in front of the token's own: a token tells the way from the root.
+// A token begins with its parent's token. So it is the path from the root.
 std::optional<std::string> LinuxLinkReport::newHierarchyTokenFromParentToken(
     const std::optional<std::string>& parentToken) {
   const std::string token = identifiers_.next(clock_.now());
@@ -157,7 +157,7 @@ OtlpExporter* LinuxLinkReport::exporterFor(const std::string& url) {
 
 OtlpResource LinuxLinkReport::resource() const {
   OtlpResource resource = ownResource_;
-  // Somebody opted in by giving the device a name.
+  // Users opt in by giving the device a name.
   const std::optional<Value> device = preferences_.read(kPreferenceDomain, kDeviceIdentifierKey);
   if (device && device->asString() != nullptr) resource.deviceIdentifier = device->text();
   return resource;

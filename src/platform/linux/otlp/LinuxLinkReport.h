@@ -22,22 +22,24 @@ class PreferenceStore;
 class ReportStore;
 struct LinkReportBackends;
 
-// The real-time-communication reporting service over the report store and OTLP/HTTP endpoints, whatever the
-// preferences of the domain "com.orvane.linkreport" name. docs/rtc.md says what they are and what is sent.
+// Implements the real-time-communication reporting service with the report store and OTLP/HTTP endpoints. The
+// preferences of the domain "com.orvane.linkreport" choose between them; docs/rtc.md describes the
+// preferences and what is sent.
 //
-// Backends answer at once. An endpoint gets an exporter when a session first uses it, which stays.
+// startConfigurationWithCompletionHandler() calls its handler at once. An exporter is created when a session
+// first uses an endpoint, and lives as long as the service. One thread at a time.
 class LinuxLinkReport final : public LinkReport {
  public:
   static constexpr std::string_view kPreferenceDomain = "com.orvane.linkreport";
   static constexpr std::string_view kBackendsKey = "backends";
   static constexpr std::string_view kDeviceIdentifierKey = "device_id";
   static constexpr std::string_view kEventNameAttributeKey = "event_name_attribute";
-  // A larger payload, which only a summary can be, is refused.
+  // Larger payloads are refused. Only a summary can be so large.
   static constexpr std::size_t kMaxPayloadBytes = std::size_t{32} << 20;
 
   using HttpClientMaker = std::function<std::unique_ptr<HttpClient>()>;
 
-  // `version` is the daemon's. Everything referred to outlives it.
+  // `version` is the daemon's. All arguments that are references must outlive the service.
   LinuxLinkReport(ReportStore& store, const PreferenceStore& preferences, const Clock& clock,
                   const LogCategory& log, std::string version, HttpClientMaker makeClient,
                   const OtlpOutbox::Limits& limits = {});
@@ -50,15 +52,14 @@ class LinuxLinkReport final : public LinkReport {
   [[nodiscard]] std::unique_ptr<LinkReportSession> initWithSessionInfo(
       const ValueMap& sessionInfo, const ValueMap& userInfo, const ValueArray* frameworksToCheck) override;
 
-  // Sends what waits for the network, for at most so long. Nothing is sent after it. False when something is
-  // left.
+  // Sends all waiting records within `timeout`. Nothing is sent after that. False if records are left.
   bool finish(std::chrono::milliseconds timeout);
 
  private:
   class Session;
 
   LinkReportBackends readBackends();
-  // Null when there are too many already.
+  // Null if there are already kMaxExporters exporters.
   [[nodiscard]] OtlpExporter* exporterFor(const std::string& url);
   OtlpResource resource() const;
 

@@ -13,7 +13,7 @@ using Json = nlohmann::json;
 
 constexpr std::size_t kMaxQuoted = 200;
 
-// A 64-bit integer is a text in this JSON; a number is understood, too.
+// OTLP writes a 64-bit integer as a JSON text. A JSON number is accepted, too.
 std::optional<std::int64_t> countIn(const Json& json) {
   if (json.is_number_integer()) return json.get<std::int64_t>();
   if (!json.is_string()) return std::nullopt;
@@ -47,7 +47,7 @@ std::optional<OtlpAnswer> parseOtlpAnswer(std::string_view body) {
 }
 
 std::string quotable(std::string_view text) {
-  // Bytes beyond ASCII go, too: a cut may have left part of a character.
+  // Bytes beyond ASCII are replaced, too, because substr() may have cut within a character.
   return printableAscii(std::string(text.substr(0, kMaxQuoted)));
 }
 

@@ -8,18 +8,19 @@
 
 namespace tonewerk {
 
-// What an endpoint says about a request that it accepted.
+// An endpoint's answer to a request that it accepted.
 struct OtlpAnswer {
   std::int64_t rejectedRecords = 0;
-  std::string message;  // empty when it had nothing to say
+  std::string message;  // may be empty
 
   friend bool operator==(const OtlpAnswer&, const OtlpAnswer&) = default;
 };
 
-// Out of the answer's JSON; none when it is not such an answer. An empty body accepts everything.
+// Parses the body of an answer; none if it is not such an answer. An empty body rejects no records.
 [[nodiscard]] std::optional<OtlpAnswer> parseOtlpAnswer(std::string_view body);
 
-// A stranger's words for a log line: control characters replaced, cut after 200 bytes.
+// Makes text from another host safe for a log line: cuts it after 200 bytes and replaces all bytes that are
+// not printable ASCII.
 std::string quotable(std::string_view text);
 
 }  // namespace tonewerk

@@ -37,7 +37,7 @@ void OtlpExporter::flush() {
 }
 
 void OtlpExporter::beginEnd() {
-  (void)outbox_.flush();  // the thread sends at its end in any case
+  (void)outbox_.flush();  // the thread is woken below in any case
   const MutexLock lock(mutex_);
   isEnding_ = true;
   changed_.notifyAll();
@@ -70,7 +70,7 @@ void OtlpExporter::run() {
     }
   }
   lock.unlock();
-  sender_.hurry();
+  sender_.skipRetryDelay();
   sender_.sendDue();
   lock.lock();
   hasEnded_ = true;

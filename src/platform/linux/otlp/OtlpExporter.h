@@ -18,28 +18,29 @@ class Clock;
 class HttpClient;
 class LogCategory;
 
-// Sends records to one OTLP/HTTP endpoint, on a thread of its own: nobody else ever waits for the network.
+// Sends records to one OTLP/HTTP endpoint. It uses a thread of its own, so no other thread waits for the
+// network.
 //
-// add() and flush() from any thread.
+// Any thread may call add() and flush().
 class OtlpExporter {
  public:
-  // `url` as it is posted to. What is referred to outlives it.
+  // `url` is the complete URL of the requests. The references must outlive the exporter.
   OtlpExporter(std::string url, std::unique_ptr<HttpClient> client, OtlpSender::ResourceSource resource,
                const Clock& clock, const LogCategory& log, RetryPolicy retry,
                const OtlpOutbox::Limits& limits = {});
   OtlpExporter(const OtlpExporter&) = delete;
   OtlpExporter& operator=(const OtlpExporter&) = delete;
-  // Breaks off what is being sent, and says what is lost.
+  // Cancels a running request and logs how many records are lost.
   ~OtlpExporter();
 
-  // False when there is no room for it: it is dropped and counted.
+  // False if there is no room. The record is then dropped and counted.
   [[nodiscard]] bool add(const OtlpLogRecord& record, OtlpOutbox::Urgency urgency);
-  // What waits for its batch goes out now.
+  // Sends records now that are waiting for a full batch.
   void flush();
 
-  // What waits goes out now, with one more try for what failed before; then nothing more.
+  // Starts the end: the thread sends all waiting records, tries failed ones once more, and then stops.
   void beginEnd();
-  // Until that is done, at most until `deadline`. False when it is not.
+  // Waits until the thread has done that. False if `deadline` comes first.
   [[nodiscard]] bool waitForEnd(std::chrono::steady_clock::time_point deadline);
 
  private:
@@ -49,7 +50,7 @@ class OtlpExporter {
   const Clock& clock_;
   const std::unique_ptr<HttpClient> client_;
   OtlpOutbox outbox_;
-  OtlpSender sender_;  // the thread's own
+  OtlpSender sender_;  // used by the thread, and by the destructor after it
 
   Mutex mutex_;
   Condition changed_;

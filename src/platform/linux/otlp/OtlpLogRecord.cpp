@@ -18,7 +18,7 @@ constexpr std::string_view kCategoryKey = "tonewerk.category";
 constexpr std::string_view kTypeKey = "tonewerk.type";
 constexpr std::string_view kIdentifierKey = "log.record.uid";
 constexpr std::string_view kEventNameKey = "event.name";
-constexpr std::array kOurKeys{kSessionKey, kCategoryKey, kTypeKey, kIdentifierKey, kEventNameKey};
+constexpr std::array kReservedKeys{kSessionKey, kCategoryKey, kTypeKey, kIdentifierKey, kEventNameKey};
 
 void appendText(std::string& out, std::string_view text) { appendCompactJson(out, Value(text)); }
 
@@ -97,7 +97,7 @@ void appendAnyValue(std::string& out, const Value& value) {
   out += '}';
 }
 
-// One "key": value list, comma by comma.
+// Appends an "attributes" list to a text.
 class Attributes {
  public:
   explicit Attributes(std::string& out) : out_(out) { out_ += R"("attributes":[)"; }
@@ -116,15 +116,15 @@ class Attributes {
   bool isFirst_ = true;
 };
 
-bool isOurs(std::string_view key) {
-  return std::find(kOurKeys.begin(), kOurKeys.end(), key) != kOurKeys.end();
+bool isReserved(std::string_view key) {
+  return std::find(kReservedKeys.begin(), kReservedKeys.end(), key) != kReservedKeys.end();
 }
 
-// How many entries were left out.
+// Returns how many entries were left out.
 std::size_t addPayload(Attributes& attributes, const ValueMap& payload) {
   std::size_t leftOut = 0;
   for (const ValueMap::Entry& entry : payload) {
-    if (entry.key.empty() || isOurs(entry.key)) {
+    if (entry.key.empty() || isReserved(entry.key)) {
       ++leftOut;
     } else {
       attributes.add(entry.key, entry.value);

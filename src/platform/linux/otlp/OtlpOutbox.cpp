@@ -7,7 +7,7 @@
 namespace tonewerk {
 namespace {
 
-// What a record takes beside its text.
+// Memory that a record takes in addition to its text.
 constexpr std::size_t kRecordBytes = 64;
 
 std::size_t bytesOf(const std::string& record) { return record.size() + kRecordBytes; }
@@ -47,7 +47,7 @@ std::optional<OtlpOutbox::Time> OtlpOutbox::batchedDue() const {
   if (batched_.empty()) return std::nullopt;
   const Time addedAt = batched_.front().addedAt;
   const bool isDueNow = flushed_ > 0 || batched_.size() >= limits_.batchRecords;
-  return isDueNow ? addedAt : addedAt + limits_.gather;
+  return isDueNow ? addedAt : addedAt + limits_.batchTime;
 }
 
 OtlpOutbox::Batch OtlpOutbox::take(Time now) {

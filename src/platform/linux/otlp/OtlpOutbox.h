@@ -13,12 +13,14 @@
 
 namespace tonewerk {
 
-// Encoded records that wait to be exported, and those that are being exported: bounded together.
+// Queues encoded records for export. One size limit applies to the records that wait and those that are being
+// exported.
 //
-//   add() -> at once  -> take() as soon as anybody looks -> settle()
+//   add() -> at once  -> take() at the next call -> settle()
 //         -> batched  -> take() when there are 512, after 5 s, or flushed -> settle()
 //
-// What does not fit is dropped and counted; nobody ever waits. Any thread. Times are the monotonic clock's.
+// A record that does not fit is dropped and counted; add() never waits. Any thread. Times are those of the
+// monotonic clock.
 class OtlpOutbox {
  public:
   using Time = std::chrono::nanoseconds;
@@ -27,13 +29,13 @@ class OtlpOutbox {
     std::size_t bytes = std::size_t{8} << 20;
     std::size_t batchRecords = 512;
     std::size_t batchBytes = std::size_t{4} << 20;
-    Time gather = std::chrono::seconds(5);
+    Time batchTime = std::chrono::seconds(5);  // the longest time that a record waits for its batch
   };
   enum class Urgency { kBatched, kAtOnce };
   enum class Added {
     kDropped,
     kKept,
-    kChangedDue,  // something is due at another time than before
+    kChangedDue,  // kept, and nextDue() has changed
   };
   struct Batch {
     std::vector<std::string> records;
@@ -43,19 +45,20 @@ class OtlpOutbox {
   explicit OtlpOutbox(const Limits& limits) : limits_(limits) {}
 
   [[nodiscard]] Added add(std::string record, Urgency urgency, Time now);
-  // What waits now is due. False when nothing does.
+  // Makes all waiting batched records due. False if there are none.
   [[nodiscard]] bool flush();
 
-  // When something is due, perhaps in the past; none when nothing waits.
+  // When the next record is due, which may be in the past; none if no record waits.
   [[nodiscard]] std::optional<Time> nextDue() const;
-  // Some of what is due, at least one record and not much more than `batchBytes`; empty when nothing is.
+  // Takes records that are due: at least one, and at most `batchRecords` and `batchBytes`, unless a single
+  // record is larger. Empty if no record is due.
   [[nodiscard]] Batch take(Time now);
-  // What was taken is delivered or dropped: its room is free.
+  // Frees the room of a batch that was delivered or dropped.
   void settle(const Batch& batch);
 
-  // Records dropped for want of room since the last call.
+  // The number of records that were dropped for lack of room since the last call.
   [[nodiscard]] std::uint64_t takeDropped();
-  // Records that wait or are being exported.
+  // The number of records that wait or are being exported.
   std::size_t count() const;
 
  private:
@@ -71,7 +74,7 @@ class OtlpOutbox {
   mutable Mutex mutex_;
   std::deque<Waiting> atOnce_ GUARDED_BY(mutex_);
   std::deque<Waiting> batched_ GUARDED_BY(mutex_);
-  std::size_t flushed_ GUARDED_BY(mutex_) = 0;  // of batched_, the first so many are due
+  std::size_t flushed_ GUARDED_BY(mutex_) = 0;  // this many at the front of batched_ are due
   std::size_t bytes_ GUARDED_BY(mutex_) = 0;
   std::size_t count_ GUARDED_BY(mutex_) = 0;
   std::uint64_t dropped_ GUARDED_BY(mutex_) = 0;

@@ -39,7 +39,7 @@ std::optional<OtlpOutbox::Time> OtlpSender::sendDue() {
       OtlpOutbox::Batch batch = outbox_.take(now);
       if (batch.records.empty()) {
         const auto due = outbox_.nextDue();
-        // What was added since is due at the earliest now.
+        // A record that was added since take() may be due before `now`.
         return due ? std::optional(std::max(*due - now, OtlpOutbox::Time(0))) : std::nullopt;
       }
       taken_.push_back(std::move(batch));
@@ -56,7 +56,7 @@ OtlpSender::Outcome OtlpSender::sendNext() {
     case RetryPolicy::Verdict::kSplit:
       if (taken_.front().records.size() > 1) {
         split();
-        return Outcome::kGoOn;
+        return Outcome::kContinue;
       }
       drop(taken_.front(), "a record is too large for it");
       break;
@@ -69,7 +69,7 @@ OtlpSender::Outcome OtlpSender::sendNext() {
   }
   outbox_.settle(taken_.front());
   taken_.pop_front();
-  return Outcome::kGoOn;
+  return Outcome::kContinue;
 }
 
 HttpAnswer OtlpSender::post(const OtlpOutbox::Batch& batch) {
@@ -95,21 +95,22 @@ void OtlpSender::delivered(const OtlpOutbox::Batch& batch, const HttpAnswer& ans
   takeAnswer(batch, answer);
 }
 
-// Whatever the body holds, the status has said that the records are taken.
+// Reads the body of a successful answer. The status alone says that the records were accepted, so a body that
+// cannot be read is only logged.
 void OtlpSender::takeAnswer(const OtlpOutbox::Batch& batch, const HttpAnswer& answer) {
   std::string complaint;
-  const std::optional<OtlpAnswer> said = parseOtlpAnswer(answer.body);
+  const std::optional<OtlpAnswer> parsed = parseOtlpAnswer(answer.body);
   if (!answer.problem.empty()) {
     complaint = "its answer is not whole: " + answer.problem;
-  } else if (!said) {
+  } else if (!parsed) {
     complaint = "its answer cannot be read";
-  } else if (said->rejectedRecords > 0) {
-    const auto claimed = static_cast<std::uint64_t>(said->rejectedRecords);
+  } else if (parsed->rejectedRecords > 0) {
+    const auto claimed = static_cast<std::uint64_t>(parsed->rejectedRecords);
     const std::uint64_t rejected = std::min<std::uint64_t>(claimed, batch.records.size());
     allDropped_ += rejected;
-    errorLog(log_, "%@ rejected records: %lu (%@)", url_, rejected, quotable(said->message));
-  } else if (!said->message.empty()) {
-    defaultLog(log_, "%@ says: %@", url_, quotable(said->message));
+    errorLog(log_, "%@ rejected records: %lu (%@)", url_, rejected, quotable(parsed->message));
+  } else if (!parsed->message.empty()) {
+    defaultLog(log_, "%@ says: %@", url_, quotable(parsed->message));
   }
   if (!complaint.empty() && complaint != loggedComplaint_) errorLog(log_, "%@: %@", url_, complaint);
   loggedComplaint_ = std::move(complaint);
@@ -124,8 +125,8 @@ OtlpSender::Outcome OtlpSender::retryLater(const HttpAnswer& answer) {
   return Outcome::kWait;
 }
 
-// The first half goes next. Room is accounted for by records, so that both halves together give back the
-// whole.
+// Splits the first batch into halves. Their `bytes` add up to those of the batch, so settle() frees all its
+// room.
 void OtlpSender::split() {
   OtlpOutbox::Batch whole = std::move(taken_.front());
   taken_.pop_front();
@@ -140,7 +141,7 @@ void OtlpSender::split() {
 }
 
 void OtlpSender::drop(const OtlpOutbox::Batch& batch, const std::string& why) {
-  retry_.succeeded();  // it answers
+  retry_.succeeded();  // the endpoint can be reached
   dropped_ += batch.records.size();
   allDropped_ += batch.records.size();
   logOnce(why + "; what it refuses is dropped");
@@ -152,7 +153,7 @@ void OtlpSender::logOnce(const std::string& problem) {
   errorLog(log_, "sending to %@: %@", url_, problem);
 }
 
-void OtlpSender::hurry() {
+void OtlpSender::skipRetryDelay() {
   if (!waitIsAsked_) notBefore_.reset();
 }
 

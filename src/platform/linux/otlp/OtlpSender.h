@@ -17,34 +17,36 @@ namespace tonewerk {
 class Clock;
 class LogCategory;
 
-// Gets records out of an outbox to one endpoint, one request after the other. One thread.
+// Sends the records of an outbox to one endpoint, one request at a time. One thread. A batch is handled by
+// the result of its request:
 //
-//   delivered        said so in the log when it was otherwise before
-//   cannot be now    kept, and tried again after a while, for as long as it takes
-//   too large        sent in halves; a record that is too large alone is dropped
+//   delivered        logged if an earlier batch was not delivered
+//   not possible now kept and sent again later, without a limit
+//   too large        sent in halves; a single record that is too large is dropped
 //   refused          dropped and counted
 //
-// While an endpoint cannot be reached nothing else is sent to it; what then finds no room in the outbox is
-// dropped there. Nothing is dropped without being counted in the log.
+// While a batch waits to be sent again, no other batch is sent. Records that do not fit into the outbox
+// meanwhile are dropped there. All dropped records are counted in the log.
 class OtlpSender {
  public:
-  using ResourceSource = std::function<OtlpResource()>;  // asked for every request
+  using ResourceSource = std::function<OtlpResource()>;  // called for every request
 
-  // `url` as it is posted to. Everything outlives it.
+  // `url` is the complete URL of the requests. The references must outlive the sender.
   OtlpSender(std::string url, OtlpOutbox& outbox, HttpClient& client, ResourceSource resource,
              const Clock& clock, const LogCategory& log, RetryPolicy retry);
 
-  // Sends what is due. How long until something will be; none when nothing waits.
+  // Sends all records that are due. Returns how long to wait until the next ones are due; none if no records
+  // wait.
   std::optional<OtlpOutbox::Time> sendDue();
 
-  // The end is near: no more waiting between tries, except where the endpoint asked for it.
-  void hurry();
+  // Lets the next sendDue() try again at once, unless the endpoint asked for a delay. For the end.
+  void skipRetryDelay();
 
-  // Says what is lost, and what was dropped in all. Last.
+  // Logs how many records are lost and how many were dropped in all. To be called last.
   void logLosses();
 
  private:
-  enum class Outcome { kGoOn, kWait };
+  enum class Outcome { kContinue, kWait };
 
   [[nodiscard]] Outcome sendNext();
   [[nodiscard]] HttpAnswer post(const OtlpOutbox::Batch& batch);
@@ -65,8 +67,8 @@ class OtlpSender {
 
   std::deque<OtlpOutbox::Batch> taken_;  // more than one after a split
   std::optional<OtlpOutbox::Time> notBefore_;
-  bool waitIsAsked_ = false;     // by the endpoint
-  std::string loggedProblem_;    // empty while records are taken
+  bool waitIsAsked_ = false;     // whether the endpoint asked for the delay
+  std::string loggedProblem_;    // empty while the endpoint accepts records
   std::string loggedComplaint_;  // about the last answer
   std::uint64_t dropped_ = 0;    // since the last delivery
   std::uint64_t allDropped_ = 0;

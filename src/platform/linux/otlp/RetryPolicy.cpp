@@ -19,12 +19,12 @@ std::optional<std::int64_t> secondsIn(std::string_view text) {
   }
   std::int64_t seconds = 0;
   const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), seconds);
-  // Digits that no integer holds ask for very long.
+  // A number that does not fit into 64 bits counts as the longest time.
   return error == std::errc() ? std::min(seconds, kMaxSeconds) : kMaxSeconds;
 }
 
 std::optional<double> timeIn(const std::string& text) {
-  // The form to write, and the two old ones that are still to be read.
+  // HTTP's date format, and the two obsolete ones that must still be accepted.
   for (const char* format :
        {"%a, %d %b %Y %H:%M:%S GMT", "%A, %d-%b-%y %H:%M:%S GMT", "%a %b %d %H:%M:%S %Y"}) {
     std::tm parts{};

@@ -11,7 +11,7 @@
 
 namespace tonewerk {
 
-// When an exporter tries again.
+// Decides whether and when an exporter sends a request again.
 class RetryPolicy {
  public:
   using Duration = GrowingDelay::Duration;
@@ -19,8 +19,8 @@ class RetryPolicy {
   static constexpr std::chrono::seconds kFirst{5};
   static constexpr double kFactor = 1.5;
   static constexpr std::chrono::seconds kLongest{30};
-  // What an endpoint can ask for: from this, so that it cannot have itself hammered, to that, so that it
-  // cannot silence a device for ever.
+  // Bounds of a delay that an endpoint asks for: so it can neither make a device send requests too often nor
+  // stop it for ever.
   static constexpr std::chrono::seconds kShortestAsked{1};
   static constexpr std::chrono::seconds kLongestAsked{3600};
 
@@ -30,14 +30,15 @@ class RetryPolicy {
     kSplit,  // 413: send halves
     kDrop,   // any other refusal, redirections included
   };
-  // `status` as HTTP has it, 0 without an answer.
+  // `status` is the HTTP status; 0 without an answer.
   [[nodiscard]] static Verdict verdictOf(int status);
 
-  // `jitter` gives numbers from 0 to below 1.
+  // `jitter` returns random numbers from 0 to below 1.
   explicit RetryPolicy(std::function<double()> jitter) : jitter_(std::move(jitter)) {}
 
-  // How long to wait after a failure: what the endpoint asked for, or half to the whole of an interval that
-  // grows by half with every failure in a row.
+  // How long to wait after a failure. That is the time that the endpoint `asked` for, within the bounds
+  // above; otherwise a random time between half and all of an interval, which grows by half with each failure
+  // in a row.
   Duration delayAfterFailure(std::optional<std::chrono::seconds> asked);
   void succeeded() { interval_.reset(); }
 
@@ -46,8 +47,8 @@ class RetryPolicy {
   GrowingDelay interval_{kFirst, kLongest, kFactor};
 };
 
-// The time that a Retry-After header asks for, as seconds from now or as a date of HTTP; `now` in seconds
-// since 1970. A date that has passed is zero; none for anything else.
+// Parses a Retry-After header: a number of seconds, or an HTTP date, of which the result is the time from
+// `now` (seconds since 1970). A date in the past gives zero; anything else gives none.
 [[nodiscard]] std::optional<std::chrono::seconds> parseRetryAfter(std::string_view text, double now);
 
 }  // namespace tonewerk

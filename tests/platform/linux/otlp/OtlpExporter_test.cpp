@@ -63,7 +63,7 @@ TEST_F(OtlpExporterTest, SendsRealTimeRecordsWithoutBeingAsked) {
 
 TEST_F(OtlpExporterTest, SendsABatchWhenFlushed) {
   OtlpOutbox::Limits patient;
-  patient.gather = hours(1);
+  patient.batchTime = hours(1);
   open(receiver_.address(), patient);
   for (int n = 0; n < 3; ++n) add(n, Urgency::kBatched);
   exporter_->flush();
@@ -75,7 +75,7 @@ TEST_F(OtlpExporterTest, SendsABatchWhenFlushed) {
 
 TEST_F(OtlpExporterTest, SendsABatchWhenItsTimeHasCome) {
   OtlpOutbox::Limits hasty;
-  hasty.gather = std::chrono::milliseconds(1);
+  hasty.batchTime = std::chrono::milliseconds(1);
   open(receiver_.address(), hasty);
   add(1, Urgency::kBatched);
   EXPECT_TRUE(receiver_.waitForRequests(1));
@@ -83,7 +83,7 @@ TEST_F(OtlpExporterTest, SendsABatchWhenItsTimeHasCome) {
 
 TEST_F(OtlpExporterTest, AtTheEndSendsWhatWaits) {
   OtlpOutbox::Limits patient;
-  patient.gather = hours(1);
+  patient.batchTime = hours(1);
   open(receiver_.address(), patient);
   for (int n = 0; n < 1000; ++n) add(n, Urgency::kBatched);
   EXPECT_TRUE(end());

@@ -258,10 +258,10 @@ TEST_F(OtlpSenderTest, InAHurryTriesOnceMoreUnlessTheEndpointAskedToWait) {
   client_.answers = {noAnswer("refused"), answerOf(429, "", "60")};
   add("a");
   send();
-  sender_.hurry();
+  sender_.skipRetryDelay();
   EXPECT_EQ(send(), 60.0);
   EXPECT_THAT(client_.requests, SizeIs(2));
-  sender_.hurry();
+  sender_.skipRetryDelay();
   EXPECT_EQ(send(), 60.0);
   EXPECT_THAT(client_.requests, SizeIs(2));
 }
