@@ -7,16 +7,16 @@
 
 namespace tonewerk {
 
-bool ChannelChoice::has(const ChanmeterKey& key) const {
+bool ChannelChoice::includes(const ChanmeterKey& key) const {
   if (channels_ != nullptr) return channels_->contains(key);
   return (!*group_ || key.group == *group_) && (!*subGroup_ || key.subGroup == *subGroup_);
 }
 
-bool ChannelChoice::concerns(const std::optional<std::string>& driver) const {
+bool ChannelChoice::mayInclude(const std::optional<std::string>& driver) const {
   if (channels_ == nullptr) return true;
   if (!driver) return false;
   const auto& keys = channels_->keys();
-  // The least key of that driver.
+  // The first key of this driver, if there is one.
   const auto found = std::lower_bound(keys.begin(), keys.end(), ChanmeterKey{.driver = driver});
   return found != keys.end() && found->driver == driver;
 }

@@ -10,18 +10,19 @@ namespace tonewerk {
 
 class ChanmeterChannelSet;
 
-// Which channels a reading is for. Refers to what it was made of.
+// Selects the channels to be read. It keeps references to the constructor's arguments, which must outlive it.
 class ChannelChoice {
  public:
-  // Those of a group and subgroup, each of them none for all.
+  // Selects the channels of a group and a subgroup. None stands for all groups or subgroups.
   ChannelChoice(const std::optional<std::string>& group, const std::optional<std::string>& subGroup)
       : group_(&group), subGroup_(&subGroup) {}
-  // These.
+  // Selects these channels.
   explicit ChannelChoice(const ChanmeterChannelSet& channels) : channels_(&channels) {}
 
-  bool has(const ChanmeterKey& key) const;
-  // Whether any of the driver's may be among them; the driver is none when nobody knows which it is.
-  bool concerns(const std::optional<std::string>& driver) const;
+  bool includes(const ChanmeterKey& key) const;
+  // Whether channels of this driver may be selected. Pass none if the driver is not known; that is then true
+  // only for a choice by group.
+  bool mayInclude(const std::optional<std::string>& driver) const;
 
  private:
   const std::optional<std::string>* group_ = nullptr;

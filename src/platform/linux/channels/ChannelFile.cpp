@@ -16,21 +16,21 @@ namespace {
 using Node = JsonTree::Node;
 using Kind = JsonTree::Kind;
 
-// Where in the file one stands. Lives on the stack; becomes text only when something is wrong there.
+// The position of a value in the file. It lives on the stack, and is converted into a text only for an error.
 struct Place {
   const Place* parent = nullptr;
-  const char* key = nullptr;  // none: an element of an array
+  const char* key = nullptr;  // null for an element of an array
   std::size_t index = 0;
 
-  // As "/channels/3/value", empty for the whole file.
+  // For example "/channels/3/value"; empty for the whole file.
   std::string text() const {
     if (parent == nullptr) return {};
     return parent->text() + "/" + (key != nullptr ? key : std::to_string(index));
   }
 };
 
-// Turns the fields of one JSON object into values. Each reader is false when its field is not as it must be;
-// the problem is then told.
+// Reads the fields of one JSON object. Each function returns false, and sets the problem, if its field does
+// not have the right form.
 class ObjectReader {
  public:
   ObjectReader(const JsonTree& json, const Node& node, const Place& place, ChannelFileProblem& problem)
@@ -38,7 +38,7 @@ class ObjectReader {
 
   bool isObject() { return node_.kind == Kind::kObject || fail(kChannelsWrongType, place_, "is no object"); }
 
-  // A value that may be missing is an optional one.
+  // The second overload is for fields that may be missing.
   template <typename T>
   bool read(const char* key, T& value) {
     const Node* field = json_.field(node_, key);
@@ -100,7 +100,7 @@ class ObjectReader {
       case Kind::kUnsigned:
         return take(field.unsignedInteger, place, number);
       case Kind::kDouble: {
-        // Also what an integer beyond 64 bits has become.
+        // The JSON reader turns an integer beyond 64 bits into a double.
         constexpr double kBeyond64Bits = 9223372036854775808.0;
         if (std::abs(field.number) >= kBeyond64Bits)
           return fail(kChannelsOutOfRange, place, "is out of range");
@@ -145,7 +145,7 @@ bool readState(ObjectReader& reader, ChanmeterState& state) {
          reader.read("residency", state.residency) && reader.read("duty_cycle", state.dutyCycle);
 }
 
-// A bound that is missing is the reader's matter: asking for it fails.
+// A bound may be missing. The record's user then gets an error when it asks for it.
 bool readBucket(ObjectReader& reader, ChanmeterBucket& bucket) {
   return reader.read("lower", bucket.lower) && reader.read("upper", bucket.upper) &&
          reader.read("hits", bucket.hits);
@@ -176,19 +176,19 @@ bool readChannel(ObjectReader& reader, ChanmeterRecord& record) {
   return readValue(reader, record);
 }
 
-// The parser's words from "line 3, column 7" on, without what was read last, which may be long.
+// The parser's message from "line 3, column 7" on, without the text that was read last, which may be long.
 std::string positionOf(const std::string& text) {
   const std::size_t begin = std::min(text.find("line "), text.size());
   return text.substr(begin, text.find(';', begin) - begin);
 }
 
 bool parseJson(std::string_view text, JsonTree& json, ChannelFileProblem& problem) {
-  std::string words;
-  switch (json.parse(text, words)) {
+  std::string message;
+  switch (json.parse(text, message)) {
     case JsonTree::Failure::kNone:
       return true;
     case JsonTree::Failure::kNotJson:
-      problem = {kChannelsNotJson, positionOf(words)};
+      problem = {kChannelsNotJson, positionOf(message)};
       return false;
     case JsonTree::Failure::kNumberOutOfRange:
       problem = {kChannelsOutOfRange, "a number is beyond what a double can hold"};

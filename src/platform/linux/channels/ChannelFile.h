@@ -12,19 +12,19 @@ namespace tonewerk {
 
 struct ChannelFileProblem {
   std::int64_t code = 0;  // a ChannelFailure
-  std::string text;       // with its place: "line 3, column 7: ..." or "/channels/3/value is missing"
+  std::string text;       // with the position: "line 3, column 7: ..." or "/channels/3/value is missing"
 };
 
-// One driver's channels as it publishes them, in JSON. See docs/driver-channels.md.
+// Holds the channels that one driver publishes in a JSON file. docs/driver-channels.md describes the format.
 struct ChannelFile {
-  // Of a channel whose format is a text that nobody knows.
+  // The format of a channel whose "format" field has an unknown text.
   static constexpr ChanmeterFormat kUnsupportedFormat = 255;
 
   std::string driver;
-  ChanmeterRecords records;  // as they come
+  ChanmeterRecords records;  // in the order of the file
 
-  // None when one thing in `text` is not as it must be; then `problem` is the first. Fields that have no
-  // meaning are left alone; of a field given twice the last counts.
+  // None if `text` does not have the right form; `problem` is then the first error. Unknown fields are
+  // ignored. If a field is given twice, the last one counts.
   [[nodiscard]] static std::optional<ChannelFile> parse(std::string_view text, ChannelFileProblem& problem);
 };
 

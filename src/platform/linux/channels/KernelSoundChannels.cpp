@@ -17,11 +17,11 @@
 namespace tonewerk {
 namespace {
 
-// The kernel's, in its order, and what it says where there is no state.
+// The kernel's states in its order, and its word for a substream that is not open.
 constexpr std::array<const char*, 10> kPcmStates{"OPEN",     "SETUP",  "PREPARED",  "RUNNING",      "XRUN",
                                                  "DRAINING", "PAUSED", "SUSPENDED", "DISCONNECTED", "closed"};
 
-// The numbers between `prefix` and `suffix` in the names of what is in a directory: 3 for "card3".
+// The numbers between `prefix` and `suffix` in the names of a directory's entries: 3 for "card3".
 std::set<int> numbersIn(const std::string& directory, std::string_view prefix, std::string_view suffix = {}) {
   std::set<int> numbers;
   std::error_code error;
@@ -84,7 +84,7 @@ std::vector<ChanmeterState> statesOf(const PcmStatus& status) {
 bool isAnyChosen(const ChannelChoice& choice, ChanmeterKey key, std::initializer_list<const char*> names) {
   return std::any_of(names.begin(), names.end(), [&](const char* name) {
     key.name = name;
-    return choice.has(key);
+    return choice.includes(key);
   });
 }
 
@@ -96,7 +96,7 @@ void KernelSoundChannels::read(const ChannelChoice& choice, ChanmeterRecords& re
   for (const int number : cardNumbers()) {
     const std::string card = numbered("card", number);
     const std::string driver = identifierOf(number);
-    if (!choice.concerns(driver)) continue;
+    if (!choice.mayInclude(driver)) continue;
     readPower(reading, driver, pathIn(pathIn(devices_, card), "device/power"));
     readSubstreams(reading, driver, pathIn(cards_, card), 'p');
     readSubstreams(reading, driver, pathIn(cards_, card), 'c');
@@ -122,13 +122,13 @@ void KernelSoundChannels::readPower(Reading& reading, const std::string& driver,
                                     const std::string& directory) {
   const ChanmeterKey key{.driver = driver, .group = "Speaker"};
   if (!isAnyChosen(reading.choice, key, {"Power"})) return;
-  // "unsupported" where power management is off.
+  // "unsupported" means that the device has no power management.
   const std::string status = lineOf(directory + "/runtime_status").value_or("unsupported");
   if (status == "unsupported") return;
   const std::optional<std::uint64_t> active = countIn(directory + "/runtime_active_time");
   const std::optional<std::uint64_t> suspended = countIn(directory + "/runtime_suspended_time");
   if (!active || !suspended) {
-    return complain(reading, kChannelsNotUnderstood, directory, "has no times in milliseconds");
+    return reportProblem(reading, kChannelsNotUnderstood, directory, "has no times in milliseconds");
   }
   addIfChosen(reading, stateRecord(key, "Power",
                                    {{.name = "active", .residency = *active},
@@ -147,7 +147,7 @@ void KernelSoundChannels::readSubstreams(Reading& reading, const std::string& dr
       ChanmeterKey key{.driver = driver, .group = group, .subGroup = pcm};
       key.subGroup->append(" ").append(sub);
       if (++reading.substreams > kMaxSubstreams) {
-        return complain(reading, kChannelsTooMany, directory, "has one substream too many");
+        return reportProblem(reading, kChannelsTooMany, directory, "has one substream too many");
       }
       readSubstream(reading, std::move(key), pathIn(directory, sub));
     }
@@ -158,22 +158,23 @@ void KernelSoundChannels::readSubstream(Reading& reading, ChanmeterKey key, cons
   if (!isAnyChosen(reading.choice, key, {"Hardware Position", "Delay", "State"})) return;
   std::string text;
   std::string parameters;
-  if (readTextFile(directory + "/status", text)) return;  // gone with its card
+  if (readTextFile(directory + "/status", text)) return;  // the card was removed
   if (readTextFile(directory + "/hw_params", parameters)) parameters.clear();
   const std::optional<PcmStatus> status = PcmStatus::parse(text, parameters);
-  if (!status) return complain(reading, kChannelsNotUnderstood, directory + "/status", "is not understood");
+  if (!status)
+    return reportProblem(reading, kChannelsNotUnderstood, directory + "/status", "is not understood");
   addIfChosen(reading, simpleRecord(key, "Hardware Position", status->hardwarePosition));
   addIfChosen(reading, simpleRecord(key, "Delay", status->delay));
   addIfChosen(reading, stateRecord(std::move(key), "State", statesOf(*status)));
 }
 
 void KernelSoundChannels::addIfChosen(Reading& reading, ChanmeterRecord record) {
-  if (reading.choice.has(record.key)) reading.records.push_back(shared(std::move(record)));
+  if (reading.choice.includes(record.key)) reading.records.push_back(shared(std::move(record)));
 }
 
 std::shared_ptr<const ChanmeterRecord> KernelSoundChannels::shared(ChanmeterRecord record) {
   const MutexLock lock(mutex_);
-  if (latest_.size() >= kMaxKept) latest_.clear();  // cards came and went
+  if (latest_.size() >= kMaxKept) latest_.clear();  // records of removed cards
   auto& latest = latest_[record.key];
   if (latest == nullptr || *latest != record) {
     latest = std::make_shared<const ChanmeterRecord>(std::move(record));
@@ -181,11 +182,11 @@ std::shared_ptr<const ChanmeterRecord> KernelSoundChannels::shared(ChanmeterReco
   return latest;
 }
 
-void KernelSoundChannels::complain(Reading& reading, std::int64_t code, const std::string& path,
-                                   std::string_view what) {
+void KernelSoundChannels::reportProblem(Reading& reading, std::int64_t code, const std::string& path,
+                                        std::string_view what) {
   if (!reading.error) reading.error = ChanmeterError{code};
   const MutexLock lock(mutex_);
-  if (complaints_.size() >= kMaxSubstreams || !complaints_.insert(path).second) return;
+  if (loggedPaths_.size() >= kMaxSubstreams || !loggedPaths_.insert(path).second) return;
   errorLog(log_, "%s: %s (failure %lli; the channels concerned are left out)", path, what, code);
 }
 

@@ -15,37 +15,39 @@
 
 namespace tonewerk {
 
-// What the kernel itself says of sound cards, as channels. The driver is the card's identifier, as "PCH".
+// Makes channels from the kernel's status files of sound cards. The driver is the card's identifier, such as
+// "PCH".
 //
 //   group            subgroup     channel            format   unit
 //   Tx (playback)    pcm0 sub0    Hardware Position  simple   frames   since the substream was prepared
 //   Rx (capture)                  Delay              simple   frames
-//                                 State              state    ms       in its present state, no other
+//                                 State              state    ms       in its present state only
 //   Speaker          none         Power              state    ms       active and suspended, since the start
 //
-// The kernel counts no transitions, so these are 0. A substream that nobody has open is at position 0 with no
-// delay. A card without power management has no Power.
+// The kernel does not count transitions, so these are 0. A substream that no process has open has the
+// position 0 and the delay 0. A card without power management has no Power channel.
 //
-// A channel that did not change since it was last read gives the same record again, so that the snapshots of
-// many sessions share it.
+// A channel that has not changed since the last reading gives the same record object again, so that the
+// snapshots of many sessions share it.
 //
 // Any thread.
 class KernelSoundChannels {
  public:
-  static constexpr std::size_t kMaxSubstreams = 256;  // of all cards together; the others are left out
-  static constexpr std::size_t kMaxKept = 4 * kMaxSubstreams;  // records; past them all are forgotten
+  static constexpr std::size_t kMaxSubstreams = 256;  // of all cards together; further ones are left out
+  static constexpr std::size_t kMaxKept = 4 * kMaxSubstreams;  // records; beyond that, all are dropped
 
-  // Below `root` are /proc/asound and /sys/class/sound; empty for the real ones. `log` outlives this.
+  // `root` is the directory of /proc/asound and /sys/class/sound; empty for the real ones. `log` must outlive
+  // this object.
   KernelSoundChannels(const std::string& root, const LogCategory& log)
       : cards_(root + "/proc/asound"), devices_(root + "/sys/class/sound"), log_(log) {}
 
-  // Appends the chosen channels' current records: card by card, each with its power, its playback and its
-  // capture substreams. A card that goes meanwhile gives nothing. What has another form than expected is left
-  // out, becomes `error` if there is none, and is logged once.
+  // Appends the current records of the chosen channels: for each card its power, its playback substreams and
+  // its capture substreams. A card that is removed meanwhile gives no records. A file in an unexpected form
+  // is left out and logged once. It sets `error`, unless that is set already.
   void read(const ChannelChoice& choice, ChanmeterRecords& records, std::optional<ChanmeterError>& error);
 
  private:
-  // One reading.
+  // The arguments and the state of one call of read().
   struct Reading {
     const ChannelChoice& choice;
     ChanmeterRecords& records;
@@ -60,15 +62,15 @@ class KernelSoundChannels {
   void readSubstream(Reading& reading, ChanmeterKey key, const std::string& directory);
   void addIfChosen(Reading& reading, ChanmeterRecord record);
   std::shared_ptr<const ChanmeterRecord> shared(ChanmeterRecord record);
-  void complain(Reading& reading, std::int64_t code, const std::string& path, std::string_view what);
+  void reportProblem(Reading& reading, std::int64_t code, const std::string& path, std::string_view what);
 
   const std::string cards_;
   const std::string devices_;
   const LogCategory& log_;
   Mutex mutex_;
   // The paths that were logged, at most kMaxSubstreams.
-  std::set<std::string> complaints_ GUARDED_BY(mutex_);
-  // At most kMaxKept.
+  std::set<std::string> loggedPaths_ GUARDED_BY(mutex_);
+  // The last record of each channel, at most kMaxKept.
   std::map<ChanmeterKey, std::shared_ptr<const ChanmeterRecord>> latest_ GUARDED_BY(mutex_);
 };
 

@@ -9,25 +9,25 @@
 
 namespace tonewerk {
 
-// The channels that drivers and processes publish in files, and those made of what the kernel says of sound
-// cards. docs/driver-channels.md describes both; error codes are those of ChannelFailure.
+// Provides the channels that drivers and processes publish in files, and channels made from the kernel's
+// status files of sound cards. docs/driver-channels.md describes both. Error codes are those of
+// ChannelFailure.
 //
-// Sources are read on the caller's thread, the kernel's first. One that fails takes its own channels with it
-// and no others: an error then comes together with a set. Samples are null when nothing at all could be read
-// because of failures.
+// Sources are read on the caller's thread, the kernel's first. If a source fails, only its own channels are
+// missing: the caller gets an error and a set. Samples are null if a source failed and no channel was read.
 //
-// Who is subscribed to channels gets those alone: files of other drivers are not read for it, unless nobody
-// has read them yet.
+// A subscription reads only its own channels. Files of other drivers are not read for it, except files that
+// have not been read before.
 class LinuxChanmeter final : public RecordChanmeter {
  public:
-  // `root` is where /proc and /sys are, empty for the real ones. `log` outlives this.
+  // `root` is the directory of /proc and /sys; empty for the real ones. `log` must outlive this object.
   LinuxChanmeter(std::string channelsDirectory, const LogCategory& log, const std::string& root = {})
       : kernel_(root, log), published_(std::move(channelsDirectory), log) {}
 
   [[nodiscard]] Channels copyChannelsInGroup(const std::optional<std::string>& group,
                                              const std::optional<std::string>& subGroup,
                                              std::optional<ChanmeterError>& error) override;
-  // All channels can be subscribed.
+  // Subscribes all given channels; never fails.
   [[nodiscard]] Subscription createSubscription(const Channels& channels, Channels& subscribed,
                                                 std::optional<ChanmeterError>& error) override;
   [[nodiscard]] Samples createSamples(const Subscription& subscription, const Channels& subscribed,

@@ -38,7 +38,7 @@ std::optional<std::int64_t> integerIn(std::optional<std::string_view> text) {
   return number;
 }
 
-// Of "seconds.fraction", the fraction of as many digits as the kernel likes.
+// Parses "seconds.fraction". The fraction may have any number of digits.
 std::optional<std::int64_t> millisecondsIn(std::optional<std::string_view> text) {
   constexpr std::int64_t kMaxSeconds = std::numeric_limits<std::int64_t>::max() / 1000 - 1;
   const std::optional<std::int64_t> seconds = integerIn(text);

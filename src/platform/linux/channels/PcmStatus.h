@@ -8,18 +8,19 @@
 
 namespace tonewerk {
 
-// What the kernel says of one substream of a sound card, in /proc/asound/card*/pcm*/sub*/status.
+// The kernel's status of one substream of a sound card, from /proc/asound/card*/pcm*/sub*/status.
 struct PcmStatus {
-  std::string state;                    // as "RUNNING"; "closed" when nobody has it open
-  std::int64_t hardwarePosition = 0;    // frames since it was prepared; 0 when closed
-  std::int64_t delay = 0;               // frames on their way; 0 when closed
-  std::uint64_t stateMilliseconds = 0;  // for how long it has been in its state; 0 when nobody knows
+  std::string state;                    // such as "RUNNING"; "closed" if no process has it open
+  std::int64_t hardwarePosition = 0;    // frames since it was prepared; 0 if closed
+  std::int64_t delay = 0;               // frames between the program and the hardware's output; 0 if closed
+  std::uint64_t stateMilliseconds = 0;  // time in the present state; 0 if unknown
 
-  // `status` and `parameters` are the files of these names ("status", "hw_params"). None when `status` is not
-  // in the kernel's form.
+  // `status` and `parameters` are the contents of the files "status" and "hw_params". None if `status` does
+  // not have the kernel's form.
   //
-  // How long the state lasts is the time stamp's distance from the last trigger. Most programs let the kernel
-  // take time stamps; where none does, a running substream's position at its rate says as much.
+  // The time in the state is the difference between the time stamp and the last trigger. Most programs let
+  // the kernel take time stamps. Without them, a running substream's time is its position divided by its
+  // rate.
   [[nodiscard]] static std::optional<PcmStatus> parse(std::string_view status, std::string_view parameters);
 };
 

@@ -28,7 +28,7 @@ ChannelFileProblem problemOf(const std::error_code& error) {
   return {kChannelsUnreadable, error.message()};
 }
 
-ChannelFileProblem pastBound(std::size_t bound, const char* what) {
+ChannelFileProblem limitExceeded(std::size_t bound, const char* what) {
   return {kChannelsTooMany,
           "goes past the " + std::to_string(bound) + " " + what + " that all files together may have"};
 }
@@ -39,25 +39,25 @@ void PublishedChannels::read(const ChannelChoice& choice, ChanmeterRecords& reco
                              std::optional<ChanmeterError>& error) {
   const MutexLock lock(mutex_);
   const std::vector<std::string> names = fileNames(error);
-  forgetAllBut(names);
+  forgetFilesExcept(names);
   Sums sums;
   for (const std::string& name : names) {
     File& file = files_[name];
-    // A file that is known to be another driver's need not be looked at.
-    if (file.driver && !choice.concerns(file.driver)) {
+    // A file that is known to belong to a driver that was not chosen need not be read.
+    if (file.driver && !choice.mayInclude(file.driver)) {
       sums.bytes += file.text.size();
       sums.channels += file.records.size();
       continue;
     }
     const std::string path = directory_ + "/" + name;
     const ChannelFileProblem problem = refresh(path, file, sums);
-    complain(path, problem, file.logged);
+    logProblem(path, problem, file.logged);
     if (problem.code != 0) {
-      if (!error && choice.concerns(file.driver)) error = ChanmeterError{problem.code};
+      if (!error && choice.mayInclude(file.driver)) error = ChanmeterError{problem.code};
       continue;
     }
     std::copy_if(file.records.begin(), file.records.end(), std::back_inserter(records),
-                 [&choice](const auto& record) { return choice.has(record->key); });
+                 [&choice](const auto& record) { return choice.includes(record->key); });
   }
 }
 
@@ -85,40 +85,40 @@ std::vector<std::string> PublishedChannels::fileNames(std::optional<ChanmeterErr
                                      " channel files; left out is all from " + names[kMaxFiles] + " on"};
     names.resize(kMaxFiles);
   }
-  complain(directory_, problem, loggedOfDirectory_);
+  logProblem(directory_, problem, loggedDirectoryProblem_);
   if (problem.code != 0) error = ChanmeterError{problem.code};
   return names;
 }
 
-void PublishedChannels::forgetAllBut(const std::vector<std::string>& names) {
+void PublishedChannels::forgetFilesExcept(const std::vector<std::string>& names) {
   std::erase_if(files_, [&names](const auto& file) {
     return !std::binary_search(names.begin(), names.end(), file.first);
   });
 }
 
-// What is wrong with the file, or with its being one too many; the latter depends on the files before it.
+// Returns the file's problem. That may be that a limit is exceeded, which depends on the files before it.
 ChannelFileProblem PublishedChannels::refresh(const std::string& path, File& file, Sums& sums) {
   struct stat status {};
   if (stat(path.c_str(), &status) != 0) {
     const std::error_code error = lastSystemError();
-    file.letGo();
-    // Gone since its name was read, or a link to nowhere.
+    file.clearContents();
+    // The file was removed meanwhile, or is a dangling link.
     return error == std::errc::no_such_file_or_directory ? ChannelFileProblem() : problemOf(error);
   }
   const auto size = static_cast<std::size_t>(status.st_size);
   if (S_ISREG(status.st_mode) && size <= kMaxFileBytes) sums.bytes += size;
   if (sums.bytes > kMaxBytes) {
-    file.letGo();  // it may have been read when there were fewer files before it
-    return pastBound(kMaxBytes, "bytes");
+    file.clearContents();  // it may have been read while there were fewer files before it
+    return limitExceeded(kMaxBytes, "bytes");
   }
 
   if (!file.stamp || FileStamp::of(status) != *file.stamp) readAgain(path, file);
   sums.channels += file.records.size();
-  if (sums.channels > kMaxChannels) return pastBound(kMaxChannels, "channels");
+  if (sums.channels > kMaxChannels) return limitExceeded(kMaxChannels, "channels");
   return file.problem;
 }
 
-void PublishedChannels::File::letGo() {
+void PublishedChannels::File::clearContents() {
   stamp.reset();
   text.clear();
   text.shrink_to_fit();
@@ -130,7 +130,7 @@ void PublishedChannels::readAgain(const std::string& path, File& file) {
   FileStamp stamp{};
   file.stamp.reset();
   if (const std::error_code error = readWholeFile(path, kMaxFileBytes, text, stamp)) {
-    file.letGo();
+    file.clearContents();
     file.problem = error == std::errc::no_such_file_or_directory ? ChannelFileProblem() : problemOf(error);
     return;
   }
@@ -143,8 +143,8 @@ void PublishedChannels::readAgain(const std::string& path, File& file) {
   if (parsed) file.driver = std::move(parsed->driver);
 }
 
-void PublishedChannels::complain(const std::string& path, const ChannelFileProblem& problem,
-                                 std::string& logged) const {
+void PublishedChannels::logProblem(const std::string& path, const ChannelFileProblem& problem,
+                                   std::string& logged) const {
   if (problem.text == logged) return;
   logged = problem.text;
   if (problem.code == 0) return;

@@ -19,7 +19,7 @@ std::int64_t CapturePolicy::dayOf(const Clock& clock) {
 FaultsignError CapturePolicy::judge(const FaultsignSignature& signature, double duration) {
   if (!isValid(signature, duration)) return kFaultsignErrorInvalidParameters;
   beginDay();
-  if (count_.accepted >= kMaxADay) return kFaultsignErrorDailyLimitExceeded;
+  if (count_.accepted >= kMaxPerDay) return kFaultsignErrorDailyLimitExceeded;
   forgetOld();
   if (accepted_.contains(keyOf(signature))) return kFaultsignErrorRequestThrottled;
   return kFaultsignErrorNone;
@@ -31,7 +31,7 @@ CapturePolicy::Acceptance CapturePolicy::accept(const FaultsignSignature& signat
   return accepted_[keyOf(signature)] = clock_.monotonic();
 }
 
-// Of one that waited long, a later one of its signature may have been accepted meanwhile: that one stands.
+// If a later capture with the same signature was accepted meanwhile, its acceptance stays.
 void CapturePolicy::withdraw(const FaultsignSignature& signature, Acceptance acceptance) {
   const auto found = accepted_.find(keyOf(signature));
   if (found != accepted_.end() && found->second == acceptance) accepted_.erase(found);
@@ -43,7 +43,7 @@ bool CapturePolicy::isValid(const FaultsignSignature& signature, double duration
   return isDuration && !signature.domain.empty() && !signature.type.empty() && !signature.subType.empty();
 }
 
-// Each text with its length before it, so that no two signatures are one key.
+// Writes each text after its length, so that different signatures have different keys.
 std::string CapturePolicy::keyOf(const FaultsignSignature& signature) {
   std::string key;
   for (const std::string* text :

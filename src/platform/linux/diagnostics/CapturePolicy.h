@@ -13,42 +13,43 @@ namespace tonewerk {
 
 class Clock;
 
-// Which captures the service makes: those that say what they are about, so many a day and not too often the
-// same. One thread at a time.
+// Decides which captures the service makes. A capture needs a complete signature, and there are limits to the
+// captures per day and to the rate of captures with the same signature. One thread at a time.
 class CapturePolicy {
  public:
-  // Accepted in one day of UTC, captures that were cancelled later included.
-  static constexpr std::int64_t kMaxADay = 20;
-  // Between two of one signature, from acceptance to acceptance. One that was cancelled puts nothing off.
+  // The number of captures accepted in one day of UTC, including those that were cancelled later.
+  static constexpr std::int64_t kMaxPerDay = 20;
+  // Between the acceptances of two captures with the same signature. Cancelled captures do not count.
   static constexpr std::chrono::seconds kMinimumInterval{60};
-  // Of a session, seconds.
+  // The longest duration of a session in seconds.
   static constexpr double kLongestDuration = 86'400.0;
 
-  // What is to outlive the process.
+  // The count that is kept when the process ends.
   struct Count {
     std::int64_t day = 0;  // since 1970, in UTC
     std::int64_t accepted = 0;
     friend bool operator==(const Count&, const Count&) = default;
   };
 
-  // The day it is by the wall clock.
+  // The present day by the wall clock, counted from 1970 in UTC.
   static std::int64_t dayOf(const Clock& clock);
 
-  // `clock` outlives this; `count` is an earlier process's.
+  // `clock` must outlive this object; `count` is the one that an earlier process kept.
   CapturePolicy(const Clock& clock, Count count) : clock_(clock), count_(count) {}
 
-  // kFaultsignErrorNone for one that may be made; why not otherwise:
+  // kFaultsignErrorNone if the capture may be made, otherwise the reason:
   //   InvalidParameters    the duration is negative, too long or NaN; domain, type or subtype is empty
-  //   DailyLimitExceeded   by the wall clock: another day begins anew, also one that a clock went back to
+  //   DailyLimitExceeded   by the wall clock: every other day starts at 0, even if the clock went back to it
   //   RequestThrottled     by the monotonic clock
   [[nodiscard]] FaultsignError judge(const FaultsignSignature& signature, double duration);
 
-  // When it was, by the monotonic clock.
+  // The time of an acceptance by the monotonic clock.
   using Acceptance = std::chrono::nanoseconds;
 
-  // One that was judged so is being made.
+  // Counts a capture for which judge() has returned kFaultsignErrorNone.
   Acceptance accept(const FaultsignSignature& signature);
-  // It is not made after all: the next of its signature does not have to wait for it. The day's number stays.
+  // Withdraws the acceptance of a capture that will not be made. The next one with its signature does not
+  // have to wait. The count of the day stays.
   void withdraw(const FaultsignSignature& signature, Acceptance acceptance);
 
   const Count& count() const { return count_; }
@@ -61,7 +62,7 @@ class CapturePolicy {
 
   const Clock& clock_;
   Count count_;
-  std::map<std::string, Acceptance> accepted_;  // within the last interval only
+  std::map<std::string, Acceptance> accepted_;  // by signature, in the last kMinimumInterval only
 };
 
 }  // namespace tonewerk

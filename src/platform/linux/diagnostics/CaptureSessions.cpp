@@ -13,7 +13,7 @@
 namespace tonewerk {
 namespace {
 
-// Never early.
+// Rounded up, so that the timer never fires early.
 std::chrono::milliseconds intervalOf(double seconds) {
   const auto milliseconds = static_cast<std::int64_t>(std::ceil(seconds * 1000.0));
   return std::chrono::milliseconds(std::max<std::int64_t>(milliseconds, 1));
@@ -44,7 +44,8 @@ CaptureSessions::Outcome CaptureSessions::start(const CaptureRequest& request) {
   if (pending_.size() >= kMaxPending) return {kFaultsignErrorServiceUnavailable};
   const CapturePolicy::Acceptance acceptance = policy_.accept(request.signature);
   std::string identifier = identifiers_.next(clock_.now());
-  // The tick waits for the lock, so it finds what is being put here.
+  // The timer's callback waits for the lock. So it finds the entry even if it is due before the entry is
+  // added.
   auto timer = timers_.repeat(intervalOf(request.duration), [weak = weak_from_this(), identifier] {
     if (const auto self = weak.lock()) self->fire(identifier);
   });
@@ -52,12 +53,12 @@ CaptureSessions::Outcome CaptureSessions::start(const CaptureRequest& request) {
   return {kFaultsignErrorNone, std::move(identifier)};
 }
 
-// Under the lock to its end: whoever cancels or finishes meanwhile learns whether the capture was made.
+// Holds the lock until the capture is made, so that cancel() and finish() know whether it was made.
 void CaptureSessions::fire(const std::string& identifier) {
   const MutexLock lock(mutex_);
   const auto due = pending_.find(identifier);
   if (due == pending_.end()) return;
-  capture_(identifier, due->second.request);  // what finds no room is in its maker's log
+  capture_(identifier, due->second.request);  // logs by itself if there is no room
   pending_.erase(due);
 }
 

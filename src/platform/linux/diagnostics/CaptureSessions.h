@@ -21,29 +21,29 @@ class Clock;
 class Timer;
 class TimerService;
 
-// One capture that the service was asked for.
+// A request for one capture.
 struct CaptureRequest {
   FaultsignSignature signature;
   double duration = 0.0;  // seconds
   std::optional<ValueMap> payload;
 };
 
-// The capture service's sessions, from the request to the moment at which the capture is made:
+// Manages the capture service's sessions from the request until the capture is made:
 //
 //   snapshot() -> judged -> made
-//   start()    -> judged -> pending -> made when the duration has passed
+//   start()    -> judged -> pending -> made after the duration
 //                                   -> cancelled
-//                                   -> dropped at the end
+//                                   -> dropped by finish()
 //
-// Any thread. Whoever has a reference may use it, also after finish().
+// Any thread. It may also be used after finish().
 class CaptureSessions : public std::enable_shared_from_this<CaptureSessions> {
  public:
-  // As many as two days' captures, which is what the longest duration can bring together: the day's number is
-  // what a symptom meets, not this.
-  static constexpr std::size_t kMaxPending = 2 * CapturePolicy::kMaxADay;
+  // With the longest duration, the captures of two days can be pending at once. So this limit is never
+  // reached before the daily limit.
+  static constexpr std::size_t kMaxPending = 2 * CapturePolicy::kMaxPerDay;
 
-  // Makes the capture; false when there is no room for it. On any thread; never waits and never comes back
-  // here.
+  // Makes the capture; false if there is no room for it. It is called on any thread. It must not wait and
+  // must not call this object.
   using Capture = std::function<bool(const std::string& identifier, const CaptureRequest& request)>;
 
   struct Outcome {
@@ -51,23 +51,24 @@ class CaptureSessions : public std::enable_shared_from_this<CaptureSessions> {
     std::string identifier = {};  // an ULID; empty with an error
   };
 
-  // The clock and the timers outlive it; `capture` is not called after finish().
+  // The clock and the timers must outlive this object. `capture` is not called after finish().
   CaptureSessions(const Clock& clock, TimerService& timers, CapturePolicy::Count count, Capture capture);
   CaptureSessions(const CaptureSessions&) = delete;
   CaptureSessions& operator=(const CaptureSessions&) = delete;
   ~CaptureSessions();
 
-  // Besides what the policy refuses: kFaultsignErrorServiceUnavailable without room for the capture or for
-  // one more that is pending, and after finish(). Those do not count.
+  // Make a capture now, or after its duration. Besides the policy's errors, they fail with
+  // kFaultsignErrorServiceUnavailable if there is no room for the capture, if too many are pending, and after
+  // finish(). Such captures are not counted.
   [[nodiscard]] Outcome snapshot(const CaptureRequest& request);
   [[nodiscard]] Outcome start(const CaptureRequest& request);
 
-  // False when no such session is pending: it never was, or its capture was made or cancelled already.
+  // False if no such session is pending: it never existed, or its capture was already made or cancelled.
   [[nodiscard]] bool cancel(const std::string& identifier);
 
-  // Drops what is pending and takes no more. The identifiers that were dropped, in the order of their start;
-  // of a capture that is becoming due at the same time either it was made when this returns, or never will
-  // be.
+  // Drops all pending sessions and accepts no more. Returns the dropped identifiers in the order of their
+  // start. A capture that becomes due at the same time either was made when this function returns, or is
+  // never made.
   std::vector<std::string> finish();
 
   CapturePolicy::Count count() const;

@@ -18,7 +18,7 @@ namespace {
 
 namespace fs = std::filesystem;
 
-// Log lines and process tables are not everybody's business.
+// Other users must not read log lines and process tables.
 constexpr mode_t kDirectoryMode = 0750;
 constexpr mode_t kFileMode = 0640;
 constexpr std::uint64_t kBlockBytes = 4096;
@@ -31,12 +31,12 @@ bool isPlainCharacter(char c) {
          c == '+' || c == '.';
 }
 
-// The item itself, not what a link in its place leads to.
+// Does not follow a link.
 bool isDirectory(const std::string& path, struct stat& status) {
   return lstat(path.c_str(), &status) == 0 && S_ISDIR(status.st_mode);
 }
 
-// The names in a directory; none when it cannot be read.
+// The sorted names in a directory; none if it cannot be read.
 std::vector<std::string> namesIn(const std::string& directory) {
   std::vector<std::string> names;
   std::error_code error;
@@ -73,7 +73,7 @@ std::error_code fill(const std::string& path, const std::vector<DiagnosticFile>&
 }
 
 void removeTree(const std::string& path) {
-  std::error_code ignored;  // a leftover is swept at the next start
+  std::error_code ignored;  // sweep() removes leftovers at the next start
   fs::remove_all(path, ignored);
 }
 
@@ -179,7 +179,7 @@ std::error_code DiagnosticsDirectory::write(DiagnosticKind kind, const std::stri
   const std::string newPath = pathOf(kind, "." + name + ".new");
   removeTree(newPath);
   error = fill(newPath, files);
-  // An empty folder in the item's place would be replaced.
+  // rename() would replace an empty folder.
   if (!error && contains(kind, name)) error = std::make_error_code(std::errc::file_exists);
   if (!error && std::rename(newPath.c_str(), path.c_str()) != 0) error = lastSystemError();
   if (error) {

@@ -13,14 +13,15 @@
 
 namespace tonewerk {
 
-// The items on the disk, as the store that writes them and the tools that read them see them:
+// Reads and writes the items of diagnostics on the disk, for the store and for tools:
 //
-//   <state>/captures/01JD.../request.json     and what was collected
+//   <state>/captures/01JD.../request.json     and the collected files
 //   <state>/issue-drafts/20261120T101800.123Z/...
 //   <state>/whirlcaps/...
 //
-// An item is there whole or not at all: it is made, and taken apart, under a name that begins with a dot. No
-// name leads out of an item's directory, and links are not followed. Any thread, any process.
+// An item always exists completely or not at all: it is written and removed under a name that begins with a
+// dot. No name leads out of an item's directory, and links are not followed. Any thread of any process may
+// use it.
 class DiagnosticsDirectory {
  public:
   static constexpr std::size_t kMaxNameBytes = 100;
@@ -29,7 +30,7 @@ class DiagnosticsDirectory {
     DiagnosticKind kind = DiagnosticKind::kCapture;
     std::string name;
     std::int64_t modifiedNanoseconds = 0;  // since 1970
-    std::uint64_t bytes = 0;               // of disk, in whole blocks
+    std::uint64_t bytes = 0;               // on the disk, in whole blocks
   };
 
   struct FileEntry {
@@ -39,39 +40,41 @@ class DiagnosticsDirectory {
 
   explicit DiagnosticsDirectory(std::string stateDirectory);
 
-  // Letters, digits, '-', '_', '+' and '.', at most kMaxNameBytes, not beginning with '-' or '.': a name that
-  // needs no care anywhere.
+  // Whether the name is safe everywhere: letters, digits, '-', '_', '+' and '.', at most kMaxNameBytes, and
+  // not '-' or '.' at the beginning.
   static bool isPlainName(std::string_view name);
 
-  // What the files take on the disk as one item.
+  // The space on the disk of an item with these files.
   static std::uint64_t bytesOnDisk(const std::vector<DiagnosticFile>& files);
 
   std::string pathOf(DiagnosticKind kind, std::string_view name) const;
 
-  // Why items cannot be listed; no error where there are none.
+  // The reason why items cannot be listed. No error if there are no items.
   [[nodiscard]] std::error_code checkReadable(DiagnosticKind kind) const;
 
-  // Oldest first; a directory that is missing or cannot be read has none.
+  // The items of one kind, oldest first; none if the directory is missing or cannot be read.
   std::vector<Entry> list(DiagnosticKind kind) const;
-  // Those of all kinds, oldest first.
+  // The items of all kinds, oldest first.
   std::vector<Entry> listAll() const;
   bool contains(DiagnosticKind kind, std::string_view name) const;
 
-  // The item's files by name.
+  // The item's files, sorted by name.
   std::vector<FileEntry> filesOf(DiagnosticKind kind, std::string_view name) const;
-  // None for a name that is not plain, or a file that cannot be read.
+  // None if a name is not plain or the file cannot be read.
   [[nodiscard]] std::optional<std::string> readFile(DiagnosticKind kind, std::string_view item,
                                                     std::string_view file) const;
 
-  // On the disk when it returns without an error; nothing is left of what failed. std::errc::invalid_argument
-  // for names that are not plain, std::errc::file_exists for one that is taken.
+  // Writes an item. When it returns without an error, the item is on the disk; after an error, nothing is
+  // left. Fails with std::errc::invalid_argument if a name is not plain, and with std::errc::file_exists if
+  // the item exists.
   [[nodiscard]] std::error_code write(DiagnosticKind kind, const std::string& name,
                                       const std::vector<DiagnosticFile>& files) const;
 
-  // std::errc::no_such_file_or_directory when it is not there.
+  // Fails with std::errc::no_such_file_or_directory if the item does not exist.
   [[nodiscard]] std::error_code remove(DiagnosticKind kind, const std::string& name) const;
 
-  // Removes what a crash left half made or half taken apart. Only while nobody writes. The number of folders.
+  // Removes incomplete items that a crash left behind, and returns their number. No process may write
+  // meanwhile.
   std::size_t sweep() const;
 
  private:

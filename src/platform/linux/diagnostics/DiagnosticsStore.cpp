@@ -20,7 +20,7 @@ namespace {
 constexpr double kMegabyte = 1 << 20;
 constexpr double kDefaultMegabytes = 256;
 constexpr double kDefaultItems = 500;
-// A bound beyond this is no bound, and fits every type it is turned into.
+// Preferences are clamped to this, so that they fit into every type they are converted to.
 constexpr double kUnbounded = 1e9;
 constexpr int kCollectorNiceness = 5;
 constexpr const char* kRequestFile = "request.json";
@@ -81,7 +81,8 @@ std::error_code DiagnosticsStore::add(DiagnosticItem item, Completion completion
       if (isFirst) errorLog(log_, "too many diagnostics at once; requests are refused");
       return std::make_error_code(std::errc::no_buffer_space);
     }
-    // Only once there is room again for more than one: under a flood each place is taken at once.
+    // Only when the queue is empty again. If it were logged whenever one place is free, there would be a line
+    // for almost every request while too many arrive.
     if (pending_.empty()) refusedBefore = std::exchange(refused_, 0);
     pendingBytes_ += bytes;
     pending_.push_back({std::move(item), now, std::move(completion)});
@@ -119,7 +120,7 @@ void DiagnosticsStore::run() {
   while (const std::optional<Pending> pending = take()) process(*pending);
 }
 
-// None when the store ends and nothing is left.
+// Waits for the next item. None when the store ends and no items are left.
 std::optional<DiagnosticsStore::Pending> DiagnosticsStore::take() {
   MutexLock lock(mutex_);
   for (;;) {
@@ -174,11 +175,11 @@ std::string DiagnosticsStore::requestText(const DiagnosticItem& item, double req
   for (const auto& [file, problem] : evidence.problems) problems.set(SharedString(file), problem);
   if (!problems.empty()) request.set("problems", problems);
   std::string ignored;
-  // A payload with a number that JSON cannot say is still worth having: as null.
+  // If JSON cannot express a number of the payload, compact() writes it as null.
   return json_.pretty(request, ignored).value_or(json_.compact(request)) + "\n";
 }
 
-// An item without a name of its own is called after its time, also when another has that already.
+// An item without a name is named after its time. If that name is taken, a number is added.
 std::string DiagnosticsStore::nameOf(const DiagnosticItem& item, double requestedAt) const {
   if (!item.name.empty()) return item.name;
   const std::string time = timeName(requestedAt);
@@ -187,7 +188,7 @@ std::string DiagnosticsStore::nameOf(const DiagnosticItem& item, double requeste
   return name;
 }
 
-// Removes the oldest items until another one of so many bytes is within the bounds.
+// Removes the oldest items until there is room for a new one of `bytes` bytes.
 std::error_code DiagnosticsStore::makeRoom(std::uint64_t bytes) {
   const Bounds bounds = readBounds();
   if (bytes > bounds.bytes) return std::make_error_code(std::errc::file_too_large);
@@ -199,7 +200,7 @@ std::error_code DiagnosticsStore::makeRoom(std::uint64_t bytes) {
   for (const DiagnosticsDirectory::Entry& entry : entries) {
     if (total <= bounds.bytes && count <= bounds.items) return {};
     const std::error_code error = directory_.remove(entry.kind, entry.name);
-    // Somebody else may remove items, too. One that cannot be removed leaves the next to go.
+    // Users may remove items, too. If an item cannot be removed, the next one is tried.
     if (error && error != std::errc::no_such_file_or_directory) {
       failure = error;
       continue;
@@ -223,8 +224,8 @@ DiagnosticsStore::Bounds DiagnosticsStore::readBounds() {
   return bounds;
 }
 
-// The preference when it is a number from 1, else `otherwise`; one that is something else is named in
-// `wrong`.
+// The preference if it is a number of at least 1, otherwise `otherwise`. Appends the preference to `wrong` if
+// it is anything else.
 double DiagnosticsStore::bound(std::string_view key, double otherwise, std::string& wrong) const {
   const std::optional<Value> value = preferences_.read(kPreferenceDomain, key);
   if (!value) return otherwise;

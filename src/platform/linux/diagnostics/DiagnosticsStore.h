@@ -26,19 +26,19 @@ class JsonService;
 class LogCategory;
 class PreferenceStore;
 
-// Leaves diagnostics on the disk: for each request a folder with request.json and what the collectors gave.
+// Writes diagnostics to the disk: for each request a folder with request.json and the collectors' files.
 //
-//   add() -> bounded queue -> the store's thread: collect, make room, write, answer
+//   add() -> bounded queue -> the store's thread: collect, make room, write, call the completion
 //
-// request.json is the item's request and besides
+// request.json holds the item's request and in addition
 //   "requestedAt"   the date of add()
-//   "collected"     the names of the files beside it
-//   "problems"      by file name, what is missing or incomplete and why; absent when there is nothing
+//   "collected"     the names of the other files
+//   "problems"      by file name, why a file is missing or incomplete; absent if there are no problems
 //
-// All items together, of whatever kind, stay within the preferences "max_megabytes" (256) and "max_items"
-// (500) of the domain "com.orvane.tonewerk.diagnostics": the oldest go first, before the new one is written.
-// They are read for every item. An item that cannot be written (a full disk) leaves nothing behind and is
-// logged.
+// The items of all kinds together are limited by the preferences "max_megabytes" (256) and "max_items" (500)
+// of the domain "com.orvane.tonewerk.diagnostics", which are read for each item. Before a new item is
+// written, the oldest ones are removed as necessary. An item that cannot be written, for example on a full
+// disk, is logged and leaves no files behind.
 class DiagnosticsStore {
  public:
   static constexpr std::string_view kPreferenceDomain = "com.orvane.tonewerk.diagnostics";
@@ -46,38 +46,38 @@ class DiagnosticsStore {
   static constexpr std::string_view kMaxItemsKey = "max_items";
 
   struct Limits {
-    // More than the capture service can find due at one moment.
+    // More captures than can become due at the same time.
     std::size_t pendingItems = 48;
-    std::size_t pendingBytes = std::size_t{16} << 20;  // of requests; an item that is alone always fits
+    std::size_t pendingBytes = std::size_t{16} << 20;  // of requests; a single item always fits
     CollectorRunner::Limits collectors = {};
   };
 
-  // Whether the item is on the disk, and under which name. On the store's thread, once.
+  // Says whether the item is on the disk, and its name. Called once, on the store's thread.
   using Completion = std::function<void(const std::error_code& error, const std::string& name)>;
 
-  // Items lie in directories of `stateDirectory`, made when they are needed. Everything referred to outlives
-  // the store.
+  // Items are written to subdirectories of `stateDirectory`, which are created when necessary. All references
+  // must outlive the store.
   DiagnosticsStore(std::string stateDirectory, std::vector<std::shared_ptr<DiagnosticCollector>> collectors,
                    const JsonService& json, const PreferenceStore& preferences, const Clock& clock,
                    const LogCategory& log, const Limits& limits);
   DiagnosticsStore(const DiagnosticsStore&) = delete;
   DiagnosticsStore& operator=(const DiagnosticsStore&) = delete;
-  // finish(0).
+  // Calls finish(0).
   ~DiagnosticsStore();
 
-  // Any thread; never waits. The completion, which may be empty, only runs when this returns no error:
-  //   invalid_argument     the name is none that an item may have
-  //   no_buffer_space      too much is pending; said in the log
+  // Any thread; never waits. The completion may be empty. It is called only if add() does not fail with
+  //   invalid_argument     the name is not a plain name
+  //   no_buffer_space      too many items are pending, which is logged
   //   operation_canceled   finish() was called
-  // A name that is taken is an error of the completion's, std::errc::file_exists.
+  // If an item with this name exists, the completion gets std::errc::file_exists.
   [[nodiscard]] std::error_code add(DiagnosticItem item, Completion completion);
 
-  // Has what a crash left half made removed, on the store's thread. Once it is certain that no other daemon
-  // writes here: its half-made items look the same.
+  // Lets the store's thread remove incomplete items that a crash left behind. Call it only when no other
+  // daemon can be writing to the directory, because the items that one is writing look the same.
   void removeLeftovers();
 
-  // Takes no more items, gives those that are pending `timeout` to be collected for and then has the rest
-  // written without evidence. When it has returned no completion runs any more.
+  // Accepts no more items. Pending items are completed within `timeout`; the rest is then written without
+  // evidence. No completion is called after it has returned.
   void finish(std::chrono::milliseconds timeout);
 
  private:
@@ -111,7 +111,7 @@ class DiagnosticsStore {
   const Limits limits_;
   const DiagnosticsDirectory directory_;
   CollectorRunner runner_;
-  std::string loggedWrongBounds_;  // the thread's own
+  std::string loggedWrongBounds_;  // used by the thread only
 
   Mutex mutex_;
   Condition changed_;

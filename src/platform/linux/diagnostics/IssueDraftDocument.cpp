@@ -8,7 +8,7 @@
 namespace tonewerk {
 namespace {
 
-// On one line, and nothing in it that Markdown or HTML gives a meaning.
+// Puts the text on one line and escapes all characters that have a meaning in Markdown or HTML.
 std::string plain(std::string_view text) {
   constexpr std::string_view kSpecial = "\\`*_[]<>#|&~";
   std::string out;

@@ -9,8 +9,8 @@
 
 namespace tonewerk {
 
-// A draft of a bug report as somebody would file it, in Markdown: what happened, where, when, and what lies
-// beside it. Names that come from elsewhere are shown as they are, not read as Markdown.
+// Writes the draft of a bug report in Markdown: what happened, where and when, and the list of attached
+// files. Names from clients are escaped, so that Markdown shows them unchanged.
 struct IssueDraftDocument {
   TrackletDraft draft;
   std::optional<std::string> processName;

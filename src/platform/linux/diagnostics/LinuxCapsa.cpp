@@ -26,7 +26,7 @@ std::string textOfDay(std::int64_t day) {
   return textOf(Date{static_cast<double>(day) * kSecondsADay}).substr(0, kDateDigits);
 }
 
-// What another day's count was does not matter, so only today's text is recognised.
+// Returns a count of 0 if the stored one is that of another day.
 CapturePolicy::Count readCount(const PreferenceStore& preferences, std::int64_t today) {
   const std::optional<Value> stored =
       preferences.read(LinuxCapsa::kPreferenceDomain, LinuxCapsa::kAcceptedKey);
@@ -55,12 +55,12 @@ ValueMap replyOf(const CaptureSessions::Outcome& outcome) {
 
 }  // namespace
 
-// What reporters share; a call of theirs may keep it a little longer than LinuxCapsa.
+// The state that reporters share. A running call of a reporter may keep it a little longer than LinuxCapsa.
 struct LinuxCapsa::Service {
   std::shared_ptr<CaptureSessions> sessions;
   PreferenceStore& preferences;
   const LogCategory& log;
-  std::unique_ptr<SerialQueue> queue;  // writes the count: the work queue does not wait for a disk
+  std::unique_ptr<SerialQueue> queue;  // writes the count, so that the work queue does not wait for the disk
 
   void keepCount() {
     queue->async([held = sessions, &store = preferences, &category = log] {
@@ -106,7 +106,7 @@ class LinuxCapsa::Reporter final : public FaultsignReporter {
     if (service == nullptr) return;
     if (service->sessions->cancel(identifier)) {
       infoLog(service->log, "capture cancelled. sessionId=%@", identifier);
-    } else {  // nothing unusual: its capture was made, or it never was a session
+    } else {  // not an error: the capture may have been made already
       infoLog(service->log, "no capture to cancel: kFaultsignErrorSessionNotFound. sessionId=%@", identifier);
     }
   }

@@ -15,39 +15,39 @@ class PreferenceStore;
 class SerialQueueFactory;
 class TimerService;
 
-// Captures diagnostics into the diagnostics store, each as a folder of "captures" that is named by its
-// session's identifier. docs/diagnostics.md says what is in it, and what is refused.
+// Captures diagnostics into the diagnostics store. Each capture is a folder of "captures", named after its
+// session's identifier. docs/diagnostics.md describes the contents and the reasons for refusal.
 //
-// A reply comes on the caller's thread, before the call that it answers returns: when a capture was decided
-// on, not when it is on the disk. So whoever is told of a session can cancel it from then on. Parameters that
-// are not accepted are answered too, with why.
+// A reply is called on the caller's thread, before the call returns. It reports the decision; the capture
+// need not be on the disk yet. From then on the caller can cancel the session. Refused requests get a reply
+// with the reason.
 //
-// How many captures the day has seen outlives the process, as the preference "accepted" of
-// "com.orvane.tonewerk.captures".
+// The number of captures accepted on the present day is kept in the preference "accepted" of
+// "com.orvane.tonewerk.captures", so that it survives a restart.
 class LinuxCapsa final : public Capsa {
  public:
   static constexpr std::string_view kPreferenceDomain = "com.orvane.tonewerk.captures";
   static constexpr std::string_view kAcceptedKey = "accepted";  // a table of "day" (a text) and "count"
 
-  // Everything referred to outlives it, and the store is not finished before this is.
+  // All references must outlive this object. Call finish() here before finish() of the store.
   LinuxCapsa(DiagnosticsStore& store, PreferenceStore& preferences, SerialQueueFactory& queues,
              TimerService& timers, const Clock& clock, const LogCategory& log);
   LinuxCapsa(const LinuxCapsa&) = delete;
   LinuxCapsa& operator=(const LinuxCapsa&) = delete;
-  // finish().
+  // Calls finish().
   ~LinuxCapsa() override;
 
   std::unique_ptr<FaultsignReporter> makeReporter() override;
 
-  // Drops the captures that are pending, which is logged, and refuses all that come later. When it has
-  // returned the count is on the disk and nothing more goes to the store.
+  // Drops and logs the pending captures, and refuses all later requests. When it has returned, the count is
+  // on the disk, and no more captures are added to the store.
   void finish();
 
  private:
   class Reporter;
   struct Service;
 
-  const std::shared_ptr<Service> service_;  // reporters look for it
+  const std::shared_ptr<Service> service_;  // reporters keep weak pointers to it
 };
 
 }  // namespace tonewerk

@@ -11,13 +11,13 @@ class DiagnosticsStore;
 class SerialQueue;
 class SerialQueueFactory;
 
-// Leaves each draft in the diagnostics store, as a folder of "issue-drafts": as request.json for programs, as
-// draft.md for whoever files it. Answered on the store's thread when it is on the disk, or could not be
-// written; one that the store refuses, on a queue of the service's own.
+// Writes each draft to the diagnostics store, as a folder of "issue-drafts" with request.json for programs
+// and draft.md for people. The completion handler is called on the store's thread after the draft was written
+// or could not be written. If the store refuses a draft, the handler is called on the service's own queue.
 class LinuxIssueDraftService final : public IssueDraftService {
  public:
-  // Both outlive the service. Destroying the service gives the refusals that are still due; what the store
-  // took it answers.
+  // Both must outlive the service. The destructor calls the outstanding handlers of refused drafts. The
+  // handlers of drafts that the store accepted are called by the store.
   LinuxIssueDraftService(DiagnosticsStore& store, SerialQueueFactory& queues);
   ~LinuxIssueDraftService() override;
 

@@ -17,7 +17,8 @@ void LinuxWhirlcapRequest::request(std::string requester, std::string reason, st
                   {"payload", std::move(payload)},
                   {"flags", ValueArray{flags.first, flags.second}}};
   const std::error_code error = store_.add(std::move(item), {});
-  // The store says itself, once, that it is full; a request comes with every overload.
+  // The store logs once that it is full. A line for each request would be too many, since every overload
+  // makes one.
   if (!error || error == std::errc::no_buffer_space) return;
   errorLog(log_, "stall trace not collected. requester=%@ reason=%@: %@", requester, reason, error.message());
 }

@@ -8,11 +8,11 @@ namespace tonewerk {
 class DiagnosticsStore;
 class LogCategory;
 
-// Leaves each request with what was collected at once in the diagnostics store, as a folder of "whirlcaps".
-// What the store refuses is an error line in the log.
+// Adds each request to the diagnostics store, as a folder of "whirlcaps". A request that the store refuses is
+// logged as an error.
 class LinuxWhirlcapRequest final : public WhirlcapRequest {
  public:
-  // Both outlive the service.
+  // Both must outlive the service.
   LinuxWhirlcapRequest(DiagnosticsStore& store, const LogCategory& log) : store_(store), log_(log) {}
 
   void request(std::string requester, std::string reason, std::string description, ValueMap payload,

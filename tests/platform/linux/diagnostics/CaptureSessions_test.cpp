@@ -106,7 +106,7 @@ TEST_F(CaptureSessionsTest, OnlyWhatIsPendingCanBeCancelled) {
 
 // Sixteen were once too few for the day's twenty.
 TEST_F(CaptureSessionsTest, ADaysCapturesMayAllBePending) {
-  for (int n = 0; n < CapturePolicy::kMaxADay; ++n) EXPECT_EQ(start(60.0).error, kFaultsignErrorNone) << n;
+  for (int n = 0; n < CapturePolicy::kMaxPerDay; ++n) EXPECT_EQ(start(60.0).error, kFaultsignErrorNone) << n;
   EXPECT_EQ(start(60.0).error, kFaultsignErrorDailyLimitExceeded);
   clock.advance(60.0);
   EXPECT_THAT(made, SizeIs(20));
@@ -116,7 +116,7 @@ TEST_F(CaptureSessionsTest, SoManyMayBePendingAndNoMoreUntilOneIsGone) {
   std::string first;
   for (std::size_t n = 0; n < CaptureSessions::kMaxPending; ++n) {
     // Another day by the wall clock, to which it jumped.
-    if (n > 0 && n % CapturePolicy::kMaxADay == 0) clock.setNow(clock.now() + 86'400.0);
+    if (n > 0 && n % CapturePolicy::kMaxPerDay == 0) clock.setNow(clock.now() + 86'400.0);
     const CaptureSessions::Outcome outcome = start(60.0);
     EXPECT_EQ(outcome.error, kFaultsignErrorNone);
     if (n == 0) first = outcome.identifier;

@@ -204,7 +204,7 @@ TEST_F(LinuxCapsaTest, TheSameAgainTooSoonIsThrottled) {
 }
 
 TEST_F(LinuxCapsaTest, TheDaysCapturesAreCountedAcrossRestarts) {
-  for (int n = 0; n < CapturePolicy::kMaxADay; ++n) {
+  for (int n = 0; n < CapturePolicy::kMaxPerDay; ++n) {
     if (n == 7) begin();
     EXPECT_EQ(start(signatureOf(std::to_string(n)), 1.0).reason(), -1) << n;
     clock.advance(1.0);  // nothing stays pending
@@ -300,7 +300,7 @@ TEST_F(LinuxCapsaTest, ThreadsThatAskTogetherGetTheDaysCapturesAndNoMore) {
   std::thread other([&] { ask("other"); });
   one.join();
   other.join();
-  EXPECT_EQ(started, CapturePolicy::kMaxADay);
+  EXPECT_EQ(started, CapturePolicy::kMaxPerDay);
   end();
   EXPECT_EQ(preferences->read("com.orvane.tonewerk.captures", "accepted"),
             Value(ValueMap{{"day", "2025-11-20"}, {"count", 20}}));

@@ -13,7 +13,7 @@
 
 namespace tonewerk {
 
-// Outlives the runner when a collector hangs.
+// State shared with the collectors' threads. It outlives the runner if a collector does not return.
 struct CollectorRunner::Shared {
   // What one collector is doing.
   struct Progress {
@@ -42,7 +42,7 @@ DiagnosticEvidence CollectorRunner::run() {
   for (std::size_t index = 0; index < collectors_.size(); ++index) {
     const std::string name(collectors_[index]->fileName());
     DiagnosticCollector::Result result = runOne(index);
-    // Whatever processes, cards and nodes call themselves: who reads evidence may count on text.
+    // Names of processes, cards and nodes can hold any bytes. Readers of evidence rely on UTF-8.
     result.text = validUtf8(std::move(result.text));
     result.problem = validUtf8(std::move(result.problem));
     if (result.text.size() > limits_.bytes) {

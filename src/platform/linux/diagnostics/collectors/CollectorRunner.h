@@ -11,9 +11,9 @@
 
 namespace tonewerk {
 
-// Runs collectors one after the other, each for a bounded time, and takes a bounded number of bytes from
-// each. One that hangs is named among the problems and left behind on its thread; until it returns it is
-// not asked again.
+// Runs collectors one after the other, with limits to the time and the bytes of each. A collector that
+// exceeds its time is listed among the problems, and its thread keeps running. It is not called again until
+// it has returned.
 class CollectorRunner {
  public:
   struct Limits {
@@ -26,10 +26,10 @@ class CollectorRunner {
   CollectorRunner& operator=(const CollectorRunner&) = delete;
   ~CollectorRunner();
 
-  // One thread.
+  // Runs all collectors. One thread at a time.
   [[nodiscard]] DiagnosticEvidence run();
 
-  // Any thread. A run() under way returns soon, and later ones at once: with what was collected so far.
+  // Any thread. A running run() returns soon with the evidence collected so far; later ones return at once.
   void interrupt();
 
  private:

@@ -6,21 +6,22 @@
 
 namespace tonewerk {
 
-// Takes one kind of evidence. Each call runs on a thread of its own, never two calls of one collector at
-// once. A collector that does not return is left behind; its object then lives until it does.
+// Collects one kind of evidence. Each call runs on a thread of its own; a collector never has two calls at
+// once. If a call does not return in time, the runner does not wait for it, and the collector lives until the
+// call returns.
 class DiagnosticCollector {
  public:
   struct Result {
-    std::string text;     // the file's; no file when it is empty
-    std::string problem;  // what went wrong, in words; empty when nothing did
+    std::string text;     // the file's contents; if it is empty, there is no file
+    std::string problem;  // describes what went wrong; empty if nothing did
   };
 
   virtual ~DiagnosticCollector() = default;
 
-  // Of the file that it fills: "processes.txt".
+  // The name of its file, such as "processes.txt".
   virtual std::string_view fileName() const = 0;
 
-  // Bounded in what it reads; what it takes too long for is its runner's to judge.
+  // Must limit how much it reads. The runner limits its time.
   [[nodiscard]] virtual Result collect() = 0;
 };
 

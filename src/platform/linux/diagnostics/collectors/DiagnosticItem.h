@@ -12,7 +12,7 @@
 
 namespace tonewerk {
 
-// What an item of the diagnostics store came from.
+// The source of an item of the diagnostics store.
 enum class DiagnosticKind { kCapture, kIssueDraft, kWhirlcap };
 
 inline constexpr std::array kDiagnosticKinds{DiagnosticKind::kCapture, DiagnosticKind::kIssueDraft,
@@ -36,21 +36,22 @@ struct DiagnosticFile {
   std::string text;
 };
 
-// What the collectors gave.
+// The collectors' results.
 struct DiagnosticEvidence {
   std::vector<DiagnosticFile> files;
-  // The names of files that are missing or incomplete, and why.
+  // The names of files that are missing or incomplete, each with the reason.
   std::vector<std::pair<std::string, std::string>> problems;
 };
 
-// Something to be left on the disk: a request and what goes with it.
+// A request for diagnostics, to be written to the disk.
 struct DiagnosticItem {
   DiagnosticKind kind = DiagnosticKind::kCapture;
-  // The folder's; when it is empty, the time becomes the name. See DiagnosticsDirectory::isPlainName().
+  // The folder's name; if it is empty, the folder is named after the time. See
+  // DiagnosticsDirectory::isPlainName().
   std::string name = {};
-  // For request.json; "requestedAt", "collected" and "problems" are added to it.
+  // The contents of request.json; the store adds "requestedAt", "collected" and "problems".
   ValueMap request = {};
-  // Makes one more file of what was collected; may be empty. Runs on the store's thread.
+  // Makes one more file from the evidence; may be empty. Called on the store's thread.
   std::function<DiagnosticFile(Date requestedAt, const DiagnosticEvidence&)> describe = {};
 };
 

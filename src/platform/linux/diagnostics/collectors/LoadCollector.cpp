@@ -11,7 +11,7 @@ DiagnosticCollector::Result LoadCollector::collect() {
     const std::string path = procDirectory_ + "/" + name;
     std::string text;
     if (const std::error_code error = readTextFile(path, text)) {
-      // Kernels can be built without pressure.
+      // Some kernels are built without /proc/pressure.
       result.problem += (result.problem.empty() ? "" : "; ") + path + ": " + error.message();
       continue;
     }

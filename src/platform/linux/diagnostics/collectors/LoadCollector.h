@@ -7,7 +7,7 @@
 
 namespace tonewerk {
 
-// How busy the system is: /proc/loadavg, and /proc/pressure of processors, storage and memory.
+// Collects the system's load: /proc/loadavg, and /proc/pressure of processors, storage and memory.
 class LoadCollector final : public DiagnosticCollector {
  public:
   explicit LoadCollector(std::string procDirectory = "/proc") : procDirectory_(std::move(procDirectory)) {}

@@ -9,7 +9,7 @@
 
 namespace tonewerk {
 
-// The last lines of the daemon's log.
+// Collects the last lines of the daemon's log.
 class LogTailCollector final : public DiagnosticCollector {
  public:
   explicit LogTailCollector(std::shared_ptr<const RecentLines> lines) : lines_(std::move(lines)) {}

@@ -9,7 +9,7 @@
 
 namespace tonewerk {
 
-// PipeWire's graph as pw-dump prints it, where there is a PipeWire.
+// Collects PipeWire's graph as pw-dump prints it.
 class PipeWireGraphCollector final : public DiagnosticCollector {
  public:
   static constexpr BoundedCommand::Limits kLimits{std::chrono::seconds(5), std::size_t{2} << 20};

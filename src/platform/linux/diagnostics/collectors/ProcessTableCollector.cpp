@@ -21,7 +21,7 @@ std::string lineOf(const ProcessRow& row) {
                 static_cast<unsigned long long>(row.residentBytes / kKibibyte),
                 static_cast<unsigned long long>(row.privateBytes / kKibibyte),
                 static_cast<unsigned long long>(row.lockedBytes / kKibibyte));
-  // A process may call itself anything, line breaks included.
+  // A process's name may contain any characters, including line breaks.
   return text.data() + withoutControlCharacters(row.name) + "\n";
 }
 

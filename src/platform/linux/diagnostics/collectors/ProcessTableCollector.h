@@ -8,8 +8,8 @@
 
 namespace tonewerk {
 
-// The processes with their processor time and memory, those first that had the most processor time. Command
-// lines are left out: they are nobody's business.
+// Collects the processes with their processor time and memory, sorted by processor time, the largest first.
+// Command lines are left out, because they may hold private data.
 class ProcessTableCollector final : public DiagnosticCollector {
  public:
   static constexpr std::size_t kMaxRows = 4096;

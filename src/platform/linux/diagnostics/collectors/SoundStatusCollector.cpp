@@ -14,9 +14,9 @@ namespace {
 
 namespace fs = std::filesystem;
 
-// Paths of regular files, in order, up to `most`. Links are left out: they are cards' names, for directories
-// that are walked anyway.
-std::error_code findFiles(const std::string& directory, int depth, std::size_t most,
+// Finds at most `maxFiles` regular files and sorts their paths. Links are left out: they are the cards'
+// names, and lead to directories that are visited anyway.
+std::error_code findFiles(const std::string& directory, int depth, std::size_t maxFiles,
                           std::vector<std::string>& found) {
   std::error_code error;
   fs::recursive_directory_iterator at(directory, error);
@@ -24,7 +24,7 @@ std::error_code findFiles(const std::string& directory, int depth, std::size_t m
     if (at.depth() >= depth) at.disable_recursion_pending();
     std::error_code unknown;
     if (!fs::is_regular_file(at->symlink_status(unknown))) continue;
-    if (found.size() == most) break;
+    if (found.size() == maxFiles) break;
     found.push_back(at->path().string());
   }
   std::sort(found.begin(), found.end());

@@ -8,8 +8,8 @@
 
 namespace tonewerk {
 
-// What the kernel says of sound devices: the files below /proc/asound, one after the other, each under its
-// path.
+// Collects the kernel's status of sound devices: the files below /proc/asound, one after the other, each
+// after a line with its path.
 class SoundStatusCollector final : public DiagnosticCollector {
  public:
   struct Limits {

@@ -10,7 +10,8 @@ namespace tonewerk {
 
 class RecentLines;
 
-// Those that go with every item, quickest first: load, log, processes, sound devices, PipeWire's graph.
+// The collectors that run for every item, quickest first: load, log, processes, sound devices, PipeWire's
+// graph.
 std::vector<std::shared_ptr<DiagnosticCollector>> makeStandardCollectors(
     std::shared_ptr<const RecentLines> logLines);
 
