@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 
-// The tracepoints tonewerk:signpost_begin and tonewerk:signpost_end. Read several times over by LTTng's
-// macros, so without a guard of the usual kind.
+// Defines the tracepoints tonewerk:signpost_begin and tonewerk:signpost_end. LTTng's macros include this file
+// several times, so it has no ordinary include guard.
 #undef LTTNG_UST_TRACEPOINT_PROVIDER
 #define LTTNG_UST_TRACEPOINT_PROVIDER tonewerk
 

@@ -8,19 +8,19 @@
 
 namespace tonewerk {
 
-// What somebody takes of the device: processor time in seconds, memory in KiB. Each of the four resources has
-// two parts that add up.
+// The processor time in seconds and the memory in KiB that a process, or the whole system, uses. Each of the
+// four resources is the sum of two parts.
 struct MemoryUsage {
   double userSeconds = 0.0;
   double systemSeconds = 0.0;
-  // Resident: pages of its own, and pages of files or shared with others.
+  // Resident memory: private pages, and pages of files or shared with other processes.
   std::uint64_t anonymous = 0;
   std::uint64_t shared = 0;
-  // Never swapped: what somebody asked to be locked, and what devices (for the whole system: the kernel) hold
-  // on to.
+  // Memory that is never swapped: locked on request, and pinned by devices (for the whole system: by the
+  // kernel).
   std::uint64_t locked = 0;
   std::uint64_t pinned = 0;
-  // Of its own, wherever it is: resident (`anonymous`), and swapped.
+  // The swapped part of the private memory; `anonymous` is the resident part.
   std::uint64_t swapped = 0;
 
   double seconds() const { return userSeconds + systemSeconds; }
@@ -39,10 +39,10 @@ struct ProcessUsage {
   MemoryUsage usage;
 };
 
-// A look at everything at about one time.
+// The usage of all processes and the system at about the same time.
 struct UsageSnapshot {
-  std::vector<ProcessUsage> processes;  // those with memory of their own, so none of the kernel's threads
-  std::size_t unreadable = 0;           // processes that are there but did not let themselves be read
+  std::vector<ProcessUsage> processes;  // those with private memory; kernel threads have none
+  std::size_t unreadable = 0;           // number of processes that exist but could not be read
   MemoryUsage system;
 };
 

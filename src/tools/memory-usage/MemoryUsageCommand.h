@@ -5,7 +5,7 @@
 
 namespace tonewerk {
 
-// Everything that tw-memory-usage does. Gives its exit status: 0 done, 1 nothing could be read or written, 2
+// Runs tw-memory-usage and returns its exit status: 0 for success, 1 if reading or writing failed, 2 for
 // wrong usage.
 [[nodiscard]] int runMemoryUsage(int argc, const char* const* argv, std::ostream& out, std::ostream& err);
 

@@ -46,7 +46,7 @@ ProcReader::Outcome ProcReader::readProcess(std::int32_t identifier, ProcessUsag
   if (const std::error_code error = files_.read(identifier, "status", text)) return outcomeOf(error);
   const KeyValueLines status(text);
   const auto numberAt = [&](std::string_view name) { return status.number(name).value_or(0); };
-  // Neither a thread of the kernel nor a process that has ended has any.
+  // Kernel threads and ended processes have no private memory.
   if (!status.find("RssAnon")) return Outcome::kWithoutMemory;
   process.process = identifier;
   process.user = static_cast<std::uint32_t>(numberAt("Uid"));

@@ -12,16 +12,17 @@
 
 namespace tonewerk {
 
-// Reads /proc. The counters that the kernel keeps anyway, not the walk over all pages behind smaps: under
-// memory pressure that would be the next problem.
+// Reads the memory usage from /proc. It uses only counters that the kernel keeps anyway. Reading smaps would
+// walk over all pages, which would make things worse under memory pressure.
 class ProcReader {
  public:
-  // `root` is "/proc", or what looks like it. `ticksPerSecond` of its processor times.
+  // `root` is "/proc", or a copy of its layout in tests. `ticksPerSecond` is the unit of the processor times
+  // in it.
   ProcReader(std::string root, double ticksPerSecond)
       : root_(std::move(root)), files_(root_), ticksPerSecond_(ticksPerSecond) {}
 
-  // Processes in order of their numbers. None, and why in `problem`, when there is no such directory or it
-  // does not say how much memory there is. A process that ends meanwhile is left out.
+  // The processes are in the order of their identifiers. None if the directory or the system's memory usage
+  // cannot be read; `problem` then says why. A process that ends meanwhile is left out.
   [[nodiscard]] std::optional<UsageSnapshot> read(std::string& problem) const;
 
  private:

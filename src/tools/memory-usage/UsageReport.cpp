@@ -90,8 +90,8 @@ void sortProcesses(std::vector<ProcessUsage>& processes, UsageOrder order) {
   });
 }
 
-void writeUsageText(std::ostream& out, const UsageSnapshot& snapshot, std::size_t most) {
-  for (std::size_t at = 0; at < std::min(most, snapshot.processes.size()); ++at) {
+void writeUsageText(std::ostream& out, const UsageSnapshot& snapshot, std::size_t maxProcesses) {
+  for (std::size_t at = 0; at < std::min(maxProcesses, snapshot.processes.size()); ++at) {
     const ProcessUsage& process = snapshot.processes[at];
     writeBlock(
         out,
@@ -104,8 +104,8 @@ void writeUsageText(std::ostream& out, const UsageSnapshot& snapshot, std::size_
   writeBlock(out, "the whole system", snapshot.system, "kernel");
 }
 
-void writeUsageJson(std::ostream& out, const UsageSnapshot& snapshot, std::size_t most) {
-  for (std::size_t at = 0; at < std::min(most, snapshot.processes.size()); ++at) {
+void writeUsageJson(std::ostream& out, const UsageSnapshot& snapshot, std::size_t maxProcesses) {
+  for (std::size_t at = 0; at < std::min(maxProcesses, snapshot.processes.size()); ++at) {
     const ProcessUsage& process = snapshot.processes[at];
     Json object{{"pid", process.process}, {"name", process.name}, {"user", process.user}};
     addUsage(object, process.usage, "pinned");

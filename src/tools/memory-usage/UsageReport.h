@@ -12,10 +12,11 @@ namespace tonewerk {
 
 enum class UsageOrder { kFootprint, kResident, kWired, kProcessorTime, kProcess };
 
-// Largest first, processes of the same size by number.
+// Sorts the processes, largest first; processes of the same size are in the order of their identifiers.
 void sortProcesses(std::vector<ProcessUsage>& processes, UsageOrder order);
 
-// For each of the first `most` processes, for all processes together and for the whole system:
+// Writes a block for each of the first `maxProcesses` processes, for all processes together and for the whole
+// system:
 //
 //        RESOURCE      TOTAL       FIRST      SECOND      MOSTLY  4711 pipewire (user 1000)
 //        cpu_time      12.50       10.00        2.50        user
@@ -23,10 +24,10 @@ void sortProcesses(std::vector<ProcessUsage>& processes, UsageOrder order);
 //       wired_mem          0           0           0        none
 //  phys_footprint      20100       20000         100    resident
 //
-// The daemon's memory log keeps lines by the words in them, and knows the third one by its spaces.
-void writeUsageText(std::ostream& out, const UsageSnapshot& snapshot, std::size_t most);
+// The daemon's memory log selects lines by their words, and recognises the third one by its spaces.
+void writeUsageText(std::ostream& out, const UsageSnapshot& snapshot, std::size_t maxProcesses);
 
-// The same, one JSON object a line.
-void writeUsageJson(std::ostream& out, const UsageSnapshot& snapshot, std::size_t most);
+// Writes the same data as JSON, one object per line.
+void writeUsageJson(std::ostream& out, const UsageSnapshot& snapshot, std::size_t maxProcesses);
 
 }  // namespace tonewerk

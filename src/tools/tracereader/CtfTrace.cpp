@@ -26,7 +26,7 @@ using Graph = std::unique_ptr<bt_graph, Release<bt_graph_put_ref>>;
 using Iterator = std::unique_ptr<bt_message_iterator, Release<bt_message_iterator_put_ref>>;
 using Parameters = std::unique_ptr<bt_value, Release<bt_value_put_ref>>;
 
-// The streams' directories: those with a metadata file. The library does not look for them itself.
+// Finds the directories of the streams: those with a metadata file. The library does not search for them.
 std::vector<std::string> streamDirectories(const std::string& root) {
   std::vector<std::string> found;
   std::error_code error;
@@ -62,7 +62,7 @@ const bt_field* memberOf(const bt_field* structure, const char* name) {
   return bt_field_structure_borrow_member_field_by_name_const(structure, name);
 }
 
-// What the graph's end does with messages.
+// Receives the messages at the end of the graph.
 class Sink {
  public:
   explicit Sink(const std::function<bool(const SignpostEvent&)>& take) : take_(take) {}
@@ -85,7 +85,7 @@ class Sink {
         return BT_GRAPH_SIMPLE_SINK_COMPONENT_CONSUME_FUNC_STATUS_ERROR;
     }
     for (std::uint64_t i = 0; i < count; ++i) {
-      if (problem_.empty()) look(messages[i]);
+      if (problem_.empty()) handle(messages[i]);
       bt_message_put_ref(messages[i]);
     }
     return problem_.empty() ? BT_GRAPH_SIMPLE_SINK_COMPONENT_CONSUME_FUNC_STATUS_OK
@@ -93,10 +93,10 @@ class Sink {
   }
 
  private:
-  void look(const bt_message* message) {
+  void handle(const bt_message* message) {
     switch (bt_message_get_type(message)) {
       case BT_MESSAGE_TYPE_EVENT:
-        lookAtEvent(message);
+        handleEvent(message);
         break;
       case BT_MESSAGE_TYPE_DISCARDED_EVENTS: {
         std::uint64_t count = 0;
@@ -113,7 +113,7 @@ class Sink {
     }
   }
 
-  void lookAtEvent(const bt_message* message) {
+  void handleEvent(const bt_message* message) {
     const bt_event* event = bt_message_event_borrow_event_const(message);
     const char* eventName = bt_event_class_get_name(bt_event_borrow_class_const(event));
     if (eventName == nullptr) return;
@@ -159,7 +159,8 @@ bt_graph_simple_sink_component_consume_func_status consume(bt_message_iterator*,
 }
 void finalize(void* sink) { static_cast<Sink*>(sink)->dropIterator(); }
 
-// Puts together: a source a directory -> a muxer -> the sink. Calls keep answering false after a failure.
+// Builds the graph: one source per directory -> a muxer -> the sink. A function returns false if it fails;
+// the graph must not be used then.
 class GraphBuilder {
  public:
   explicit GraphBuilder(bt_graph* graph) : graph_(graph) {}
@@ -187,7 +188,7 @@ class GraphBuilder {
     if (!isAdded) return false;
     const std::uint64_t count = bt_component_source_get_output_port_count(source);
     for (std::uint64_t i = 0; i < count; ++i) {
-      // The muxer grows an input for each that is taken.
+      // The muxer adds an input port whenever one is connected.
       if (!connect(bt_component_source_borrow_output_port_by_index_const(source, i),
                    bt_component_filter_borrow_input_port_by_index_const(muxer_, inputs_++))) {
         return false;

@@ -8,12 +8,12 @@
 
 namespace tonewerk {
 
-// Hands every signpost event of the trace below `directory` to `take`, in the order of time, until that
-// answers false. Empty when the whole trace was read, else what was wrong with it; a trace that has lost
-// events is refused, because its ends would find wrong begins.
+// Calls `take` with every signpost event of the trace in `directory`, in the order of time, until it returns
+// false. Returns an empty text if the whole trace was read, otherwise the problem. A trace with lost events
+// is refused, because ends could be matched with wrong begins.
 //
-// A damaged trace may keep the underlying library busy for ever or make it end the process: whoever calls
-// this is ready for both.
+// A damaged trace can make the library loop for ever or end the process. So call this only in a process that
+// may be killed.
 [[nodiscard]] std::string readCtfTrace(const std::string& directory,
                                        const std::function<bool(const SignpostEvent&)>& take);
 

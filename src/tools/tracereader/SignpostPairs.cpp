@@ -17,7 +17,7 @@ bool SignpostPairs::add(const SignpostEvent& event) {
   const auto found = open_.find(key);
   if (found == open_.end()) return true;
   close(found->second, event, name);
-  // Identifiers come and go.
+  // Otherwise the map would grow with each new identifier.
   if (found->second.empty()) open_.erase(found);
   return true;
 }

@@ -11,18 +11,18 @@
 
 namespace tonewerk {
 
-// A signpost that a program passed.
+// One event: a program has passed a signpost.
 struct SignpostEvent {
   bool isBegin = false;
   std::string_view name;
   std::uint64_t identifier = 0;
   std::int64_t process = 0;
   std::int64_t thread = 0;
-  std::int64_t nanoseconds = 0;  // since some fixed point
+  std::int64_t nanoseconds = 0;  // since an arbitrary fixed time
 };
 
-// Makes intervals of begins and ends of one name, identifier, process and thread: an end belongs to the
-// newest begin that is open. What has no partner is left out.
+// Makes intervals from begins and ends with the same name, identifier, process and thread. An end belongs to
+// the newest begin that has no end yet. Events without a partner are left out.
 class SignpostPairs {
  public:
   static constexpr std::size_t kMaxOpen = 1'000'000;
@@ -32,12 +32,13 @@ class SignpostPairs {
     std::uint64_t nanoseconds;
   };
 
-  // In the order of time. False when more than kMaxOpen are open: then this is full, and takes no more.
+  // Events must be added in the order of time. False if kMaxOpen begins have no end yet; the event is not
+  // added then.
   [[nodiscard]] bool add(const SignpostEvent& event);
 
-  // All the names seen, in the order of their first sight.
+  // All names, in the order in which they first occurred.
   const std::vector<std::string>& names() const { return names_; }
-  // In the order of their ends.
+  // The intervals, in the order of their ends.
   const std::vector<Interval>& intervals() const { return intervals_; }
 
  private:

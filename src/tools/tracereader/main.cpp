@@ -1,13 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// tw-trace-reader: the intervals of a trace's signposts as text, for the daemon, which runs it as a process
-// of its own because damaged traces can hang or end whoever reads them.
+// tw-trace-reader writes the intervals of a trace's signposts as text. The daemon runs it as a separate
+// process, because a damaged trace can make its reader hang or crash.
 //
-//   name decode          the next name, from 0 on; "\\" and "\n" stand for a backslash and a newline
-//   0 1523411            an interval of name 0, in nanoseconds
-//   end                  that was all
+//   name decode          the next name, counted from 0; "\\" and "\n" stand for a backslash and a newline
+//   0 1523411            the duration of an interval with name 0, in nanoseconds
+//   end                  the last line
 //
-// A trace that cannot be used gives "problem TEXT" instead, and exit status 1; wrong usage 2.
+// If the trace cannot be used, it writes "problem TEXT" instead and exits with status 1. Wrong usage gives
+// status 2.
 
 #include <cstdio>
 #include <string>

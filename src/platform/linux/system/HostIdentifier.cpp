@@ -6,7 +6,7 @@
 namespace tonewerk {
 namespace {
 
-// The hash's key. Another one makes every host a new one to its receivers.
+// The key of the hash. If it is changed, every host gets a new identifier.
 constexpr sd_id128_t kKey = {
     {0x6f, 0x1d, 0xc8, 0x42, 0x93, 0x5e, 0x4b, 0x07, 0xa6, 0x38, 0xe1, 0x74, 0x2c, 0x9b, 0xd0, 0x55}};
 

@@ -5,9 +5,9 @@
 
 namespace tonewerk {
 
-// What tells this host from others in what leaves it: made of the machine's identifier by a keyed hash, so
-// that the latter cannot be found out from it and other programs' identifiers cannot be matched with it. 32
-// hexadecimal digits; empty on a host without a machine identifier.
+// An identifier of this host for data that is sent to other hosts. It is a keyed hash of the machine
+// identifier. So the machine identifier cannot be derived from it, and it cannot be matched with identifiers
+// of other programs. 32 hexadecimal digits; empty on a host without a machine identifier.
 std::string hostIdentifier();
 
 }  // namespace tonewerk

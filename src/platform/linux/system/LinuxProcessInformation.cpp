@@ -32,7 +32,7 @@ std::variant<std::uint64_t, std::string> LinuxProcessInformation::physicalFootpr
   const KeyValueLines lines(status);
   const auto resident = lines.number("RssAnon");
   if (!resident) return "no RssAnon in " + path;
-  // Kernels built without swapping have no such line.
+  // Kernels built without swap support do not write VmSwap.
   return (*resident + lines.number("VmSwap").value_or(0)) * kKibibyte;
 }
 

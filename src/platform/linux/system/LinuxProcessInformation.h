@@ -5,18 +5,18 @@
 
 namespace tonewerk {
 
-// Processes as /proc shows them.
+// Reads data of processes from /proc.
 class LinuxProcessInformation final : public ProcessInformation {
  public:
-  // `procDirectory` is where to look, for tests.
+  // Tests pass another directory instead of "/proc".
   explicit LinuxProcessInformation(std::string procDirectory = "/proc")
       : procDirectory_(std::move(procDirectory)) {}
 
-  // PID/comm, which the kernel cuts to 15 bytes. What it leaves of a character reads as U+FFFD.
+  // Reads PID/comm. The kernel cuts the name to 15 bytes; an incomplete character becomes U+FFFD.
   [[nodiscard]] std::optional<std::string> processName(std::int32_t processIdentifier) const override;
   std::int32_t ownProcessIdentifier() const override;
-  // RssAnon and VmSwap of self/status: counters that the kernel keeps anyway, unlike the precise walk over
-  // all pages behind self/smaps_rollup.
+  // The sum of RssAnon and VmSwap of self/status. The kernel keeps these counters anyway, whereas
+  // self/smaps_rollup is more precise but walks over all pages.
   [[nodiscard]] std::variant<std::uint64_t, std::string> physicalFootprint() const override;
   std::int64_t processorTimeMicroseconds() const override;
 

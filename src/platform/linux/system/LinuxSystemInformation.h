@@ -13,26 +13,26 @@
 
 namespace tonewerk {
 
-// The device's state out of /sys, /proc and the power-profiles service.
+// Reads the device's state from /sys, /proc and the power-profiles service.
 //
-// No caller waits for another process: the power profile is followed on a thread (see PowerProfileWatcher)
-// and false until its first answer; what /sys says is read at most once a second.
+// No call waits for another process: PowerProfileWatcher follows the power profile on its own thread, and
+// power-saver mode counts as off until the first answer. /sys is read at most once a second. Any thread.
 class LinuxSystemInformation final : public SystemInformation {
  public:
-  // How old what was read from /sys may be. Sessions often stop together, and reading a sensor can take
-  // milliseconds.
+  // The maximum age of values from /sys. Many sessions often stop at the same time, and reading a sensor can
+  // take milliseconds.
   static constexpr std::chrono::seconds kMaxAge{1};
 
-  // `clock` outlives this. `sysDirectory` and `busAddress` (empty for the system's bus) are where to look,
-  // for tests.
+  // `clock` must outlive this object. Tests pass another `sysDirectory` and `busAddress`; an empty address
+  // stands for the system's bus.
   explicit LinuxSystemInformation(const Clock& clock, std::string sysDirectory = "/sys",
                                   std::string busAddress = {});
 
   // See thermalLevelOf().
   int thermalLevel() const override;
 
-  // On when the power-profiles service says "power-saver", or the firmware's platform profile is "low-power"
-  // (on firmware that has no such profile: "quiet").
+  // True if the power-profiles service reports "power-saver", or the firmware's platform profile is
+  // "low-power" ("quiet" on firmware without a low-power profile).
   bool isLowPowerModeEnabled() const override;
 
   std::array<double, 3> loadAverages() const override;

@@ -18,7 +18,7 @@ namespace {
 
 constexpr std::chrono::minutes kReconnectInterval{1};
 
-// One name under which the service may be found; its interface has the same name.
+// A bus name of the service; the interface has the same name.
 struct ServiceName {
   const char* name;
   const char* path;
@@ -29,7 +29,7 @@ constexpr std::array<ServiceName, 2> kServices = {{
     {"net.hadess.PowerProfiles", "/net/hadess/PowerProfiles"},
 }};
 
-// Waits for the bus or the end. False for the end.
+// Waits for `other` or the timeout, and returns true. Returns false when `stop` becomes readable.
 bool waitFor(int stop, const pollfd& other, std::chrono::milliseconds timeout) {
   std::array<pollfd, 2> waited = {pollfd{stop, POLLIN, 0}, other};
   poll(waited.data(), waited.size(), static_cast<int>(timeout.count()));
@@ -45,12 +45,12 @@ class Watch {
   }
   Watch(const Watch&) = delete;
   Watch& operator=(const Watch&) = delete;
-  // Without the bus nothing is known of a profile.
+  // Without a connection the profile is unknown, which counts as false.
   ~Watch() {
     for (Service& service : services_) note(service, false);
   }
 
-  // Until the bus is lost (true) or the end (false).
+  // Follows the profile. Returns true when the connection is lost, and false when `stop` becomes readable.
   bool follow(int stop) {
     if (bus_ == nullptr || !subscribe()) return true;
     for (;;) {
@@ -83,8 +83,8 @@ class Watch {
         static_cast<Service*>(data)->watch->ask(*static_cast<Service*>(data));
         return 0;
       };
-      // Signals first, so that no change falls between the answer and the signal. A change is asked for anew,
-      // since the signal may say only that there was one.
+      // The signals are subscribed to before the profile is asked for, so that no change is missed. After a
+      // signal the profile is asked for again, because the signal need not contain the new value.
       if (sd_bus_add_match_async(bus_.get(), nullptr, owner.c_str(), ask, nullptr, &service) < 0 ||
           sd_bus_match_signal_async(bus_.get(), nullptr, name.name, name.path,
                                     "org.freedesktop.DBus.Properties", "PropertiesChanged", ask, nullptr,
@@ -108,7 +108,7 @@ class Watch {
     if (sd_bus_message_append(question.get(), "ss", name.name, "ActiveProfile") < 0) return;
     const auto answered = [](sd_bus_message* answer, void* data, sd_bus_error*) {
       const char* profile = nullptr;
-      // An error answer means that nobody has the name.
+      // An error means that the service is not running.
       const bool isKnown = sd_bus_message_is_method_error(answer, nullptr) == 0 &&
                            sd_bus_message_read(answer, "v", "s", &profile) >= 0 && profile != nullptr;
       auto& asked = *static_cast<Service*>(data);
@@ -130,8 +130,8 @@ class Watch {
 
   PowerProfileWatcher::ChangeHandler& handler_;
   std::array<Service, kServices.size()> services_;
-  std::string problem_;  // of no use here: the bus is looked for again
-  Bus bus_;              // last: its callbacks refer to the services
+  std::string problem_;  // not used, because the bus is opened again after a problem
+  Bus bus_;              // last: its callbacks use services_
 };
 
 void watch(int stop, const std::string& address, PowerProfileWatcher::ChangeHandler& handler) {

@@ -9,26 +9,28 @@
 
 namespace tonewerk {
 
-// Follows the power profile that the user chose, as the desktop's power-profiles service tells it on the
-// system's D-Bus (org.freedesktop.UPower.PowerProfiles, and its older name net.hadess.PowerProfiles).
+// Follows the power profile that the user has chosen. It gets the profile from the desktop's power-profiles
+// service on the system's D-Bus (org.freedesktop.UPower.PowerProfiles, or its older name
+// net.hadess.PowerProfiles).
 //
-// Asks once and then listens, on a thread of its own, so that nobody ever waits for the bus. The service is
-// not started for it; one that starts later is noticed. Without a bus it is looked for again every minute.
+// It runs on a thread of its own, so that no caller waits for the bus. It asks for the profile and then
+// listens for signals. It does not start the service, but notices when it starts. Without a bus, it tries
+// again every minute.
 class PowerProfileWatcher {
  public:
-  // Told on the watcher's thread whenever it changed whether the profile is "power-saver"; it starts as
-  // false.
+  // Called on the watcher's thread when the profile becomes "power-saver" or stops being it. The initial
+  // state is false.
   using ChangeHandler = std::function<void(bool isPowerSaver)>;
 
-  // `busAddress` is a D-Bus address; empty for the system's bus.
+  // `busAddress` is a D-Bus address; empty stands for the system's bus.
   explicit PowerProfileWatcher(ChangeHandler handler, std::string busAddress = {});
   PowerProfileWatcher(const PowerProfileWatcher&) = delete;
   PowerProfileWatcher& operator=(const PowerProfileWatcher&) = delete;
-  // The handler is not running any more when it returns.
+  // When it returns, the handler is not running any more.
   ~PowerProfileWatcher();
 
  private:
-  const FileDescriptor stop_;  // an eventfd that becomes readable at the end
+  const FileDescriptor stop_;  // an eventfd; the destructor makes it readable
   std::thread thread_;
 };
 

@@ -10,7 +10,8 @@
 namespace tonewerk {
 namespace {
 
-// 0 for what is no process's name; those have no leading zeros.
+// The process identifier that a directory is named after; 0 if it is not a process's directory. Identifiers
+// have no leading zeros.
 std::int32_t processOf(const std::string& name) {
   std::int32_t process = 0;
   const auto parsed = std::from_chars(name.data(), name.data() + name.size(), process);

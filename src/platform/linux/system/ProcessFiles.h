@@ -9,18 +9,18 @@
 
 namespace tonewerk {
 
-// The processes that are there, and the files that the kernel keeps of each, as /proc shows them.
+// Lists the processes in /proc and reads the kernel's files about each.
 class ProcessFiles {
  public:
-  // `directory` is "/proc", or what looks like it.
+  // `directory` is "/proc", or a copy of its layout in tests.
   explicit ProcessFiles(std::string directory) : directory_(std::move(directory)) {}
 
-  // The numbers of all processes, in order. With `error` when the directory cannot be read to its end; then
-  // those that were found.
+  // The identifiers of all processes, sorted. If the directory cannot be read to its end, `error` is set and
+  // the result holds those found so far.
   std::vector<std::int32_t> processes(std::error_code& error) const;
 
-  // The bytes of one file of a process, "stat" or "status"; neither is ever empty. A name in them is what the
-  // process chose.
+  // Reads one file of a process, "stat" or "status". An empty file is an error. Processes choose their own
+  // names, so a name in the file may hold any bytes.
   [[nodiscard]] std::error_code read(std::int32_t process, const std::string& file, std::string& bytes) const;
 
   // Whether read() failed because the process has ended.

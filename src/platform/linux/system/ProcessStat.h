@@ -10,7 +10,7 @@
 
 namespace tonewerk {
 
-// The words of a text, between white space.
+// Splits a text at white space.
 inline std::vector<std::string_view> splitWhitespace(std::string_view text) {
   constexpr std::string_view kWhiteSpace = " \t\n";
   std::vector<std::string_view> words;
@@ -23,7 +23,7 @@ inline std::vector<std::string_view> splitWhitespace(std::string_view text) {
   }
 }
 
-// The number that is the whole word; 0 where it is none.
+// Parses a word as a number; 0 if the whole word is not a number.
 template <typename Number>
 Number numberIn(std::string_view word) {
   Number number{};
@@ -31,20 +31,20 @@ Number numberIn(std::string_view word) {
   return parsed.ec == std::errc() && parsed.ptr == word.data() + word.size() ? number : Number{};
 }
 
-// The text of /proc/PID/stat, "PID (name) S 1 ...".
+// The parts of the text in /proc/PID/stat: "PID (name) S 1 ...".
 struct ProcessStat {
-  // Places in `fields`.
+  // Indices in `fields`.
   static constexpr std::size_t kState = 0;
   static constexpr std::size_t kParent = 1;
   static constexpr std::size_t kUserTicks = 11;
   static constexpr std::size_t kSystemTicks = 12;
   static constexpr std::size_t kThreads = 17;
-  static constexpr std::size_t kFields = 18;  // up to the last of them
+  static constexpr std::size_t kFields = 18;  // the number of fields up to the last index
 
-  std::string_view name;                 // may hold anything, closing brackets included
-  std::vector<std::string_view> fields;  // those behind the name; at least kFields
+  std::string_view name;                 // may hold any characters, including closing brackets
+  std::vector<std::string_view> fields;  // after the name; at least kFields
 
-  // What it gives refers to `text`. None for what is no such text, or ends before kFields.
+  // The result refers to `text`. None if the text has another form or fewer than kFields fields.
   [[nodiscard]] static std::optional<ProcessStat> parse(std::string_view text) {
     const std::size_t opening = text.find('(');
     const std::size_t closing = text.rfind(')');

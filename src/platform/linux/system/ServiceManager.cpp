@@ -10,8 +10,8 @@
 namespace tonewerk {
 namespace {
 
-// The variables stay for later messages. Programs that the daemon runs inherit them; the manager takes
-// messages of the main process alone.
+// The variables are kept for later messages. Programs that the daemon runs inherit them, but the manager
+// accepts messages of the main process only.
 constexpr int kKeepVariables = 0;
 
 void tell(const std::string& message) { ::sd_notify(kKeepVariables, message.c_str()); }
@@ -20,7 +20,7 @@ void tell(const std::string& message) { ::sd_notify(kKeepVariables, message.c_st
 
 void ServiceManager::tellReady(const std::string& status) const { tell("READY=1\nSTATUS=" + status); }
 
-// The manager tells by the time which READY=1 belongs to this.
+// The time tells the manager which READY=1 belongs to this message.
 void ServiceManager::tellReloading() const {
   timespec now{};
   ::clock_gettime(CLOCK_MONOTONIC, &now);
@@ -28,8 +28,8 @@ void ServiceManager::tellReloading() const {
   tell("RELOADING=1\nMONOTONIC_USEC=" + std::to_string(microseconds));
 }
 
-// A ping that is on its way when the manager ends us would start its watch anew, which nobody feeds any more.
-// A time-out of 0 ends that watch.
+// If a ping arrives after the manager has told the daemon to end, the manager starts the watchdog again, and
+// no more pings follow. A timeout of 0 switches the watchdog off.
 void ServiceManager::tellStopping(const std::string& status) const {
   tell((pingInterval() ? "STOPPING=1\nWATCHDOG_USEC=0\nSTATUS=" : "STOPPING=1\nSTATUS=") + status);
 }

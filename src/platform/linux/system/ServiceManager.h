@@ -7,30 +7,30 @@
 
 namespace tonewerk {
 
-// What the daemon tells the service manager that started it, over the socket that NOTIFY_SOCKET names.
-// Without that variable there is nobody to tell, and nothing happens; a message that cannot be sent is lost,
-// since the manager notices by itself what matters.
+// Sends the daemon's state to the service manager that started it, through the socket that NOTIFY_SOCKET
+// names. Without that variable it does nothing. A message that cannot be sent is lost; that does no harm,
+// because the manager notices the end of the daemon and missing pings by itself.
 //
-// Any thread, as long as none changes the environment.
+// Any thread, as long as no thread changes the environment.
 class ServiceManager {
  public:
-  // Rarer pings are not worth a longer sum.
+  // An upper limit, so that calculations with the interval cannot overflow.
   static constexpr std::chrono::hours kLongestPingInterval{1};
 
-  // Clients are served from now on. `status` is for people, in one line.
+  // Says that the daemon serves clients from now on. `status` is one line for people.
   void tellReady(const std::string& status) const;
 
-  // The configuration is being read again, until tellReady().
+  // Says that the daemon reads its configuration again. tellReady() ends that state.
   void tellReloading() const;
 
-  // The end has begun, and takes as long as it takes: the manager expects no more pings.
+  // Says that the daemon is ending. From then on the manager expects no more pings.
   void tellStopping(const std::string& status) const;
 
-  // The thread that serves clients is alive.
+  // Says that the thread that serves clients is alive.
   void ping() const;
 
-  // How often the manager wants a ping: in half the time after which it gives the process up (WATCHDOG_USEC,
-  // where WATCHDOG_PID is none or this process). None where it wants none. At least a millisecond.
+  // How often to ping: half of the manager's timeout, and at least a millisecond. The timeout is
+  // WATCHDOG_USEC, if WATCHDOG_PID is not set or is this process. None if the manager expects no pings.
   std::optional<std::chrono::milliseconds> pingInterval() const;
 };
 

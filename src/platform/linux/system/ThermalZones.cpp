@@ -12,7 +12,7 @@
 namespace tonewerk {
 namespace {
 
-constexpr int kMaxTripPoints = 64;  // the kernel's own bound is lower
+constexpr int kMaxTripPoints = 64;  // the kernel's own limit is lower
 
 std::optional<std::string> lineOf(const std::string& path) {
   std::string text;

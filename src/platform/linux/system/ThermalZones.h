@@ -5,8 +5,8 @@
 
 namespace tonewerk {
 
-// How hot the device is, by its own judgement: each thermal zone of the kernel has trip points, temperatures
-// from which on something is done about it. The hottest zone counts.
+// The device's thermal level. Each of the kernel's thermal zones has trip points: temperatures above which
+// the kernel acts. The zone with the highest level counts.
 //
 //   trip points reached            level
 //   none                           0, nominal
@@ -14,8 +14,8 @@ namespace tonewerk {
 //   "hot"                          2, serious: the kernel asks for help
 //   "critical"                     3, critical: the kernel is about to switch the device off
 //
-// Zones that are switched off or cannot be read, and trip points that are not set (0 degrees and less), do
-// not count. `directory` is /sys/class/thermal.
+// Zones that are disabled or cannot be read do not count, nor do trip points that are not set (0 degrees and
+// less). `directory` is /sys/class/thermal.
 int thermalLevelOf(const std::string& directory);
 
 }  // namespace tonewerk

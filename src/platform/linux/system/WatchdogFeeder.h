@@ -8,23 +8,24 @@ namespace tonewerk {
 
 class Clock;
 
-// Pings at an interval, from a loop that waits for other things, too:
+// Sends pings at an interval from a loop that also waits for other events:
 //
 //   for (;;) {
 //     wait(feeder.timeToNext());
 //     feeder.pingIfDue();
 //   }
 //
-// so that a loop which hangs is one that pings no more. The loop's thread.
+// So no pings are sent when the loop hangs. Only the loop's thread may use it.
 class WatchdogFeeder {
  public:
-  // The first ping is due at once. `clock` outlives the feeder.
+  // The first ping is due at once. `clock` must outlive the feeder.
   WatchdogFeeder(std::chrono::milliseconds interval, const Clock& clock, std::function<void()> ping);
 
-  // Rounded up, so that a loop which waited for so long finds a ping due. 0 when one is.
+  // The time until the next ping is due; 0 if it is due now. Rounded up, so that the ping is due after a wait
+  // of this length.
   std::chrono::milliseconds timeToNext() const;
 
-  // However many were missed, it is one ping, and the next is due an interval from now.
+  // Sends one ping if any is due, even if several were missed. The next one is due an interval from now.
   void pingIfDue();
 
  private:

@@ -14,10 +14,10 @@ class JsonService;
 class LogCategory;
 class TimerService;
 
-// What performance tracing is made of. Everything referred to outlives it.
+// The parts that performance tracing needs. The references must outlive it.
 struct TracingParts {
-  std::string directory;        // where traces lie while somebody wants them; absolute, for nothing else
-  std::string signpostLibrary;  // as dlopen() takes it
+  std::string directory;        // holds traces while they are in use; an absolute path, for nothing else
+  std::string signpostLibrary;  // name or path for dlopen()
   std::string traceReader;      // the path of tw-trace-reader
   const FileSystem& files;
   const JsonService& json;
@@ -25,14 +25,14 @@ struct TracingParts {
   const LogCategory& log;
 };
 
-// Performance tracing, by way of what this build has for it.
+// Performance tracing, with the implementation that this build has.
 struct Tracing {
   std::unique_ptr<Runtrace> runtrace;
   std::unique_ptr<Kolvi> kolvi;
 };
 Tracing makeTracing(const TracingParts& parts);
 
-// Whether this build has anything.
+// Whether this build can trace.
 bool isTracingBuiltIn();
 
 }  // namespace tonewerk

@@ -14,18 +14,18 @@
 namespace tonewerk {
 
 std::string signpostLibraryName() {
-  const char* wish = ::secure_getenv("TONEWERK_SIGNPOSTS");
-  return wish != nullptr && wish[0] == '/' ? wish : signpost::kProviderLibrary;
+  const char* path = ::secure_getenv("TONEWERK_SIGNPOSTS");
+  return path != nullptr && path[0] == '/' ? path : signpost::kProviderLibrary;
 }
 
 std::string tracesDirectory(const std::string& stateDirectory) {
-  std::error_code error;  // without a working directory it stays as it is
+  std::error_code error;  // if there is no working directory, the path stays relative
   const std::filesystem::path absolute = std::filesystem::absolute(stateDirectory, error);
   return (error ? std::filesystem::path(stateDirectory) : absolute) / "traces";
 }
 
 std::string traceReaderPath() {
-  std::error_code error;  // then it is looked for in PATH
+  std::error_code error;  // after an error, only the name is returned, and PATH is searched for it
   const std::filesystem::path executable = std::filesystem::read_symlink("/proc/self/exe", error);
   return executable.parent_path() / "tw-trace-reader";
 }

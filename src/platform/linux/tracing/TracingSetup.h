@@ -6,17 +6,18 @@
 
 namespace tonewerk {
 
-// What programs with signposts load, as dlopen() takes it: the path that TONEWERK_SIGNPOSTS says, or else the
-// usual name.
+// The library that programs with signposts load, as a name or path for dlopen(): the absolute path in
+// TONEWERK_SIGNPOSTS, or otherwise the default name.
 std::string signpostLibraryName();
 
-// Where traces lie while they are needed; absolute, as the tracer wants it.
+// The directory of traces while they are in use. The tracer needs an absolute path.
 std::string tracesDirectory(const std::string& stateDirectory);
 
-// tw-trace-reader, which lies beside this executable.
+// The path of tw-trace-reader, which is in the directory of this executable.
 std::string traceReaderPath();
 
-// Tells programs that start from now on whether signposts can be traced here: by a file that is there or not.
+// Creates or removes the file that tells programs whether signposts can be traced. Programs check it when
+// they start.
 [[nodiscard]] std::error_code setSignpostMark(const std::string& runtimeDirectory, bool canBeTraced);
 
 }  // namespace tonewerk

@@ -9,7 +9,8 @@
 
 namespace tonewerk {
 
-// The trace service where there is none: every start fails with the reason, from inside the call.
+// A trace service for builds without tracing. Every start fails with the reason; the delegate is called
+// before the start returns.
 class UnavailableRuntrace final : public Runtrace {
  public:
   explicit UnavailableRuntrace(std::string reason) : reason_(std::move(reason)) {}
@@ -20,7 +21,7 @@ class UnavailableRuntrace final : public Runtrace {
   const std::string reason_;
 };
 
-// The trace-model library where there is none: no trace opens.
+// A trace-model library for builds without tracing. Opening a trace always fails.
 class UnavailableKolvi final : public Kolvi {
  public:
   explicit UnavailableKolvi(std::string reason) : reason_(std::move(reason)) {}
@@ -31,7 +32,7 @@ class UnavailableKolvi final : public Kolvi {
   const std::string reason_;
 };
 
-// Both.
+// Makes both.
 Tracing makeUnavailableTracing(const std::string& reason);
 
 }  // namespace tonewerk

@@ -5,12 +5,12 @@
 
 namespace tonewerk {
 
-// The static probe "event" of the provider "tonewerk", whose one argument is the code. A single no-operation
-// instruction while no tracer listens:
-//
-// Intervals are signposts, as audio programs have them.
+// Emits trace points as the static probe "event" of the provider "tonewerk", with the code as its only
+// argument. While no tracer is attached, a probe is a single no-operation instruction. To print the codes:
 //
 //   bpftrace -e 'usdt:/usr/bin/twreportingd:tonewerk:event { printf("%d\n", arg0) }'
+//
+// Intervals are signposts, like those of audio programs.
 class UsdtTracePoints final : public TracePoints {
  public:
   void emit(std::uint32_t code) override;

@@ -9,15 +9,15 @@ namespace tonewerk {
 
 using Clock = std::chrono::steady_clock;
 
-AbandonableThread::AbandonableThread(std::chrono::milliseconds patience)
-    : patience_(patience), thread_([queue = queue_] {
+AbandonableThread::AbandonableThread(std::chrono::milliseconds endTimeout)
+    : endTimeout_(endTimeout), thread_([queue = queue_] {
         nameThisThread("tonewerk.tracing");
         queue->run();
       }) {}
 
 AbandonableThread::~AbandonableThread() {
   queue_->end();
-  if (queue_->waitForEnd(patience_)) {
+  if (queue_->waitForEnd(endTimeout_)) {
     thread_.join();
   } else {
     thread_.detach();
@@ -27,7 +27,7 @@ AbandonableThread::~AbandonableThread() {
 void AbandonableThread::Queue::post(Task work) {
   const MutexLock lock(mutex_);
   if (hasEnded_) return;
-  pieces_.push_back(std::move(work));
+  tasks_.push_back(std::move(work));
   changed_.notifyAll();
 }
 
@@ -43,9 +43,9 @@ void AbandonableThread::Queue::end() {
   changed_.notifyAll();
 }
 
-bool AbandonableThread::Queue::waitForEnd(std::chrono::milliseconds patience) {
+bool AbandonableThread::Queue::waitForEnd(std::chrono::milliseconds timeout) {
   MutexLock lock(mutex_);
-  const Clock::time_point deadline = Clock::now() + patience;
+  const Clock::time_point deadline = Clock::now() + timeout;
   while (!hasEnded_ && changed_.waitUntil(lock, deadline)) {
   }
   return hasEnded_;
@@ -54,10 +54,10 @@ bool AbandonableThread::Queue::waitForEnd(std::chrono::milliseconds patience) {
 void AbandonableThread::Queue::run() {
   MutexLock lock(mutex_);
   for (;;) {
-    while (!isEnding_ && pieces_.empty()) changed_.wait(lock);
-    if (pieces_.empty()) break;
-    Task work = std::move(pieces_.front());
-    pieces_.pop_front();
+    while (!isEnding_ && tasks_.empty()) changed_.wait(lock);
+    if (tasks_.empty()) break;
+    Task work = std::move(tasks_.front());
+    tasks_.pop_front();
     busySince_ = Clock::now();
     lock.unlock();
     work();

@@ -12,18 +12,18 @@
 
 namespace tonewerk {
 
-// A thread for work that may never return. Runs pieces in order.
+// Runs tasks in order on a thread of its own. The tasks may block for ever.
 //
-// Destroying it runs what is queued, for a while; a piece that does not return by then is left behind with
-// its thread. What pieces use therefore belongs to them, not to whoever destroys this.
+// The destructor lets the thread run the queued tasks for a limited time. After that, it abandons the thread
+// together with the task that has not returned. So tasks must own everything that they use.
 class AbandonableThread {
  public:
-  // Where pieces wait; may outlive the thread. Any thread.
+  // The queue of tasks. It may outlive the thread. Any thread may use it.
   class Queue {
    public:
-    // Never waits. Once the thread has ended, `work` is destroyed instead.
+    // Never waits. After the thread has ended, `work` is destroyed without being run.
     void post(Task work);
-    // How long the piece that runs has been running; zero when none does.
+    // How long the current task has been running; zero if no task is running.
     std::chrono::milliseconds busyFor() const;
 
    private:
@@ -31,28 +31,29 @@ class AbandonableThread {
 
     void run();
     void end();
-    [[nodiscard]] bool waitForEnd(std::chrono::milliseconds patience);
+    // False if the thread has not ended within `timeout`.
+    [[nodiscard]] bool waitForEnd(std::chrono::milliseconds timeout);
 
     mutable Mutex mutex_;
     Condition changed_;
-    std::deque<Task> pieces_ GUARDED_BY(mutex_);
-    // None while no piece runs.
+    std::deque<Task> tasks_ GUARDED_BY(mutex_);
+    // When the current task started; none while no task is running.
     std::optional<std::chrono::steady_clock::time_point> busySince_ GUARDED_BY(mutex_);
     bool isEnding_ GUARDED_BY(mutex_) = false;
     bool hasEnded_ GUARDED_BY(mutex_) = false;
   };
 
-  // `patience`: how long the destructor waits.
-  explicit AbandonableThread(std::chrono::milliseconds patience);
+  // `endTimeout` is how long the destructor waits.
+  explicit AbandonableThread(std::chrono::milliseconds endTimeout);
   AbandonableThread(const AbandonableThread&) = delete;
   AbandonableThread& operator=(const AbandonableThread&) = delete;
-  // Not from a piece.
+  // Must not be called from a task.
   ~AbandonableThread();
 
   const std::shared_ptr<Queue>& queue() const { return queue_; }
 
  private:
-  const std::chrono::milliseconds patience_;
+  const std::chrono::milliseconds endTimeout_;
   const std::shared_ptr<Queue> queue_ = std::make_shared<Queue>();
   std::thread thread_;
 };

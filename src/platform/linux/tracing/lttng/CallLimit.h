@@ -9,14 +9,14 @@
 
 namespace tonewerk {
 
-// A time limit for calls to the session daemon, which have none of their own: when the scope takes longer,
-// the private session daemon is killed, and the call that waits for it fails.
+// Limits the time of calls to the session daemon, which have no timeout of their own. If the scope takes
+// longer, the private session daemon is killed, so that the waiting call fails.
 class CallLimit {
  public:
-  // Far above what the slowest programs can make a call take.
+  // Much longer than any call takes, even with slow programs.
   static constexpr std::chrono::seconds kTimeout{10};
 
-  // Both outlive the scope.
+  // Both must outlive the scope.
   CallLimit(SessionDaemon& daemon, TimerService& timers)
       : timer_(timers.repeat(kTimeout, [&daemon] { daemon.kill(); })) {}
 

@@ -5,8 +5,8 @@
 
 namespace tonewerk {
 
-// The daemon's own signpost, which it passes when a trace has begun and before it ends: a trace without both
-// is not one to draw conclusions from.
+// The daemon's own signpost. The daemon passes it after a trace has begun and before it ends. If a trace does
+// not contain both, it is incomplete and is refused.
 inline constexpr char kCheckSignpost[] = "com.orvane.tonewerk.check";
 inline constexpr std::size_t kCheckSignpostsPerTrace = 2;
 

@@ -22,10 +22,11 @@
 namespace tonewerk {
 namespace {
 
-constexpr std::chrono::seconds kPatienceAtTheEnd{15};
+constexpr std::chrono::seconds kEndTimeout{15};
 constexpr char kSharedMemory[] = "/dev/shm";
 
-// Programs and writers share memory there; without it everything seems to work and no event arrives.
+// The tracer shares memory with programs there. Without it, everything seems to work but no events are
+// recorded.
 std::string checkSharedMemory() {
   std::string name = std::string(kSharedMemory) + "/tonewerk-XXXXXX";
   const int file = ::mkstemp(name.data());
@@ -42,18 +43,19 @@ void passCheckSignpost() { const signpost::Interval interval(kCheckSignpost); }
 
 }  // namespace
 
-// A trace on its way, and who hears of it.
-class LttngRuntrace::Course {
+// One trace from its start to its end, and the delegate that gets its results.
+class LttngRuntrace::TraceRun {
  public:
-  explicit Course(RuntraceConfiguration wanted) : configuration(std::move(wanted)) {}
+  explicit TraceRun(RuntraceConfiguration wanted) : configuration(std::move(wanted)) {}
 
   void setDelegate(std::weak_ptr<RuntraceSessionDelegate> delegate) {
     const RecursiveMutexLock lock(mutex_);
     delegate_ = std::move(delegate);
   }
-  // Under the lock, so that setDelegate() waits for it; it may come from inside.
+  // Calls the delegate under the lock, so that setDelegate() waits for the call to end. The delegate may call
+  // setDelegate() itself, because the mutex is recursive.
   template <typename Call>
-  void tell(Call call) {
+  void callDelegate(Call call) {
     const RecursiveMutexLock lock(mutex_);
     if (const auto delegate = delegate_.lock()) call(*delegate);
   }
@@ -61,8 +63,8 @@ class LttngRuntrace::Course {
   const RuntraceConfiguration configuration;
   std::atomic<bool> isValid = true;
 
-  // On the control thread.
-  std::optional<LttngTrace> trace;  // while it runs
+  // Used on the control thread only.
+  std::optional<LttngTrace> trace;  // none unless it is running
   std::shared_ptr<TraceDirectory> directory;
 
  private:
@@ -70,7 +72,7 @@ class LttngRuntrace::Course {
   std::weak_ptr<RuntraceSessionDelegate> delegate_ GUARDED_BY(mutex_);
 };
 
-// What happens on the control thread.
+// Does the work of the control thread.
 class LttngRuntrace::Control {
  public:
   explicit Control(const TracingParts& parts)
@@ -79,28 +81,28 @@ class LttngRuntrace::Control {
   void prepare() { TraceDirectory::removeLeftovers(parts_.directory); }
   void end() { daemon_.end(); }
 
-  void start(Course& course) {
-    const std::string problem = begin(course);
-    if (!problem.empty()) course.isValid = false;
-    course.tell([&](RuntraceSessionDelegate& delegate) { delegate.runtraceDidStart(errorOf(problem)); });
+  void start(TraceRun& run) {
+    const std::string problem = begin(run);
+    if (!problem.empty()) run.isValid = false;
+    run.callDelegate([&](RuntraceSessionDelegate& delegate) { delegate.runtraceDidStart(errorOf(problem)); });
   }
 
-  void stop(Course& course) {
-    if (!course.trace) return;
+  void stop(TraceRun& run) {
+    if (!run.trace) return;
     passCheckSignpost();
-    std::string problem = course.trace->stop();
-    course.tell([&](RuntraceSessionDelegate& delegate) { delegate.runtraceDidStop(errorOf(problem)); });
-    const std::string problemAtTheEnd = course.trace->destroy();
+    std::string problem = run.trace->stop();
+    run.callDelegate([&](RuntraceSessionDelegate& delegate) { delegate.runtraceDidStop(errorOf(problem)); });
+    const std::string problemAtTheEnd = run.trace->destroy();
     if (problem.empty()) problem = problemAtTheEnd;
-    complete(course, problem);
+    complete(run, problem);
   }
 
-  void giveUp(Course& course) {
-    if (!course.trace) return;
-    --running_;
-    course.isValid = false;
-    course.trace.reset();
-    course.directory.reset();
+  void abandon(TraceRun& run) {
+    if (!run.trace) return;
+    --runningTraces_;
+    run.isValid = false;
+    run.trace.reset();
+    run.directory.reset();
   }
 
  private:
@@ -108,43 +110,44 @@ class LttngRuntrace::Control {
     return problem.empty() ? RuntraceError() : problem;
   }
 
-  [[nodiscard]] std::string begin(Course& course) {
+  [[nodiscard]] std::string begin(TraceRun& run) {
     const WantedSignposts wanted =
-        readWantedSignposts(course.configuration.probeListPath, parts_.files, parts_.json);
+        readWantedSignposts(run.configuration.probeListPath, parts_.files, parts_.json);
     if (!wanted.problem.empty()) return wanted.problem;
     std::string problem = checkSharedMemory();
     if (!problem.empty()) return problem;
     if (const char* reason = signpost::load(parts_.signpostLibrary.c_str())) {
       return std::string("the signpost library cannot be loaded: ") + reason;
     }
-    problem = startTrace(course, wanted.names);
-    // A private session daemon that has lost its writer is of no use any more, which only shows now.
-    if (!problem.empty() && daemon_.isPrivate() && running_ == 0) {
+    problem = startTrace(run, wanted.names);
+    // A private session daemon whose writer process has died cannot trace any more. That is only noticed
+    // here.
+    if (!problem.empty() && daemon_.isPrivate() && runningTraces_ == 0) {
       errorLog(parts_.log, "starting the tracer's session daemon again: %@", problem);
       daemon_.end();
-      problem = startTrace(course, wanted.names);
+      problem = startTrace(run, wanted.names);
     }
     if (problem.empty()) passCheckSignpost();
     return problem;
   }
 
-  [[nodiscard]] std::string startTrace(Course& course, std::set<std::string> signposts) {
+  [[nodiscard]] std::string startTrace(TraceRun& run, std::set<std::string> signposts) {
     std::error_code error;
     const std::string name = "tonewerk-" + std::to_string(::getpid()) + "-" + std::to_string(++count_);
-    course.directory = TraceDirectory::make(parts_.directory, name, error);
-    if (course.directory == nullptr) return "no directory for the trace: " + error.message();
+    run.directory = TraceDirectory::make(parts_.directory, name, error);
+    if (run.directory == nullptr) return "no directory for the trace: " + error.message();
     std::string problem = ensureDaemon();
     if (problem.empty()) problem = LttngTrace::checkThisProcessIsSeen(daemon_, parts_.timers);
     if (problem.empty()) {
       signposts.insert(kCheckSignpost);
-      course.trace.emplace(name, course.directory->path(), daemon_, parts_.timers);
-      problem = course.trace->start(signposts);
+      run.trace.emplace(name, run.directory->path(), daemon_, parts_.timers);
+      problem = run.trace->start(signposts);
     }
     if (problem.empty()) {
-      ++running_;
+      ++runningTraces_;
     } else {
-      course.trace.reset();
-      course.directory.reset();
+      run.trace.reset();
+      run.directory.reset();
     }
     return problem;
   }
@@ -154,12 +157,12 @@ class LttngRuntrace::Control {
     return daemon_.ensureRunning();
   }
 
-  void complete(Course& course, const std::string& problem) {
-    --running_;
-    course.isValid = false;
-    course.trace.reset();
-    const std::shared_ptr<TraceDirectory> directory = std::move(course.directory);
-    course.tell([&](RuntraceSessionDelegate& delegate) {
+  void complete(TraceRun& run, const std::string& problem) {
+    --runningTraces_;
+    run.isValid = false;
+    run.trace.reset();
+    const std::shared_ptr<TraceDirectory> directory = std::move(run.directory);
+    run.callDelegate([&](RuntraceSessionDelegate& delegate) {
       if (problem.empty()) {
         delegate.runtraceDidComplete(directory->path(), directory, std::nullopt);
       } else {
@@ -171,7 +174,7 @@ class LttngRuntrace::Control {
   const TracingParts parts_;
   SessionDaemon daemon_;
   std::uint64_t count_ = 0;
-  int running_ = 0;  // traces
+  int runningTraces_ = 0;
 };
 
 class LttngRuntrace::Session final : public RuntraceSession {
@@ -180,49 +183,49 @@ class LttngRuntrace::Session final : public RuntraceSession {
           const RuntraceConfiguration& configuration)
       : control_(std::move(control)),
         queue_(std::move(queue)),
-        course_(std::make_shared<Course>(configuration)) {}
+        run_(std::make_shared<TraceRun>(configuration)) {}
   Session(const Session&) = delete;
   Session& operator=(const Session&) = delete;
-  // After a stop that was asked for: the trace has then ended.
+  // Abandons a running trace. A stop that was requested before is completed first.
   ~Session() override {
-    post([](Control& control, Course& course) { control.giveUp(course); });
+    post([](Control& control, TraceRun& run) { control.abandon(run); });
   }
 
   void setDelegate(std::weak_ptr<RuntraceSessionDelegate> delegate) override {
-    course_->setDelegate(std::move(delegate));
+    run_->setDelegate(std::move(delegate));
   }
   void startRuntrace() override {
     if (queue_->busyFor() < kMaxBusy) {
-      post([](Control& control, Course& course) { control.start(course); });
+      post([](Control& control, TraceRun& run) { control.start(run); });
       return;
     }
-    course_->isValid = false;
-    course_->tell([](RuntraceSessionDelegate& delegate) {
+    run_->isValid = false;
+    run_->callDelegate([](RuntraceSessionDelegate& delegate) {
       delegate.runtraceDidStart("the session daemon does not answer");
     });
   }
   void stopRuntrace() override {
-    post([](Control& control, Course& course) { control.stop(course); });
+    post([](Control& control, TraceRun& run) { control.stop(run); });
   }
-  bool isValid() const override { return course_->isValid; }
+  bool isValid() const override { return run_->isValid; }
 
  private:
   template <typename Work>
   void post(Work work) {
-    queue_->post([control = control_, course = course_, work] { work(*control, *course); });
+    queue_->post([control = control_, run = run_, work] { work(*control, *run); });
   }
 
   const std::shared_ptr<Control> control_;
   const std::shared_ptr<AbandonableThread::Queue> queue_;
-  const std::shared_ptr<Course> course_;
+  const std::shared_ptr<TraceRun> run_;
 };
 
 LttngRuntrace::LttngRuntrace(const TracingParts& parts)
-    : control_(std::make_shared<Control>(parts)), thread_(kPatienceAtTheEnd) {
+    : control_(std::make_shared<Control>(parts)), thread_(kEndTimeout) {
   thread_.queue()->post([control = control_] { control->prepare(); });
 }
 
-// On the thread that started it, because it ends with that.
+// The session daemon is ended on the thread that started it, because it also ends with that thread.
 LttngRuntrace::~LttngRuntrace() {
   thread_.queue()->post([control = control_] { control->end(); });
 }

@@ -9,21 +9,21 @@
 
 namespace tonewerk {
 
-// Traces signposts with LTTng. The session daemon is talked to on one thread, because the control library
-// takes no two at once and has no time-outs.
+// Traces signposts with LTTng. All calls to the session daemon are made on one control thread, because the
+// control library is not thread-safe and has no timeouts.
 //
-// A start reads the probe list, makes sure that a session daemon runs and hears this process, and asks for
-// the signposts that the list names. The finished trace lies in a directory of its own until its token goes.
-// The daemon passes a signpost of its own at the beginning and the end.
+// A start reads the probe list, makes sure that a session daemon is running and has registered this process,
+// and enables the signposts of the list. The finished trace is in a directory of its own until its token is
+// destroyed. The daemon passes its own signpost at the beginning and the end of a trace.
 class LttngRuntrace final : public Runtrace {
  public:
-  // A control thread that is busy for longer than this is taken for one that hangs.
+  // If one task keeps the control thread busy for longer than this, the thread is assumed to hang.
   static constexpr std::chrono::seconds kMaxBusy{20};
 
   explicit LttngRuntrace(const TracingParts& parts);
   LttngRuntrace(const LttngRuntrace&) = delete;
   LttngRuntrace& operator=(const LttngRuntrace&) = delete;
-  // Gives up traces that are under way and ends the private session daemon.
+  // Ends the private session daemon. Traces that are still running are not completed.
   ~LttngRuntrace() override;
 
   [[nodiscard]] std::shared_ptr<RuntraceSession> makeSession(
@@ -31,11 +31,11 @@ class LttngRuntrace final : public Runtrace {
 
  private:
   class Control;
-  class Course;
+  class TraceRun;
   class Session;
 
-  const std::shared_ptr<Control> control_;  // used on the thread, which may outlive this
-  AbandonableThread thread_;                // last: it uses the control
+  const std::shared_ptr<Control> control_;  // used by the thread, which may outlive this object
+  AbandonableThread thread_;                // last: it uses control_
 };
 
 }  // namespace tonewerk

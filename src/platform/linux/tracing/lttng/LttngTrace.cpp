@@ -23,13 +23,13 @@ using Clock = std::chrono::steady_clock;
 constexpr char kChannel[] = "signposts";
 constexpr char kEvents[] = "tonewerk:signpost_*";
 constexpr char kBeginEvent[] = "tonewerk:signpost_begin";
-// A processor's share: room for some 60,000 events while the writer is busy elsewhere.
+// The buffers of each processor hold about 60,000 events until the writer process reads them.
 constexpr std::uint64_t kSubBufferBytes = std::uint64_t{1} << 20;
 constexpr std::uint64_t kSubBuffers = 4;
-// Its compiled form has to stay below 64 KiB.
+// The compiled form of a filter must stay below 64 KiB.
 constexpr std::size_t kMaxFilterBytes = 8192;
 constexpr seconds kDataTimeout{60};
-// After a session daemon has died, programs take a while to look for another.
+// After a session daemon has died, programs connect to a new one only after a delay.
 constexpr seconds kSeenTimeout{8};
 constexpr milliseconds kPause{5};
 
@@ -85,7 +85,7 @@ std::vector<std::string> filtersFor(const std::set<std::string>& signposts) {
   for (const std::string& signpost : signposts) {
     std::string condition = "name == \"";
     for (const char c : signpost) {
-      // An asterisk would stand for any text.
+      // An asterisk that is not escaped matches any text.
       if (c == '\\' || c == '*') condition += '\\';
       condition += c;
     }

@@ -13,30 +13,31 @@ namespace tonewerk {
 class SessionDaemon;
 class TimerService;
 
-// One tracing session of LTTng's that records signposts. On the one thread that talks to the session daemon.
-// Calls answer empty when all went well, else what did not. Each call to the session daemon is limited
-// (CallLimit).
+// One tracing session of LTTng that records signposts. Only the thread that talks to the session daemon may
+// use it. The functions return an empty text if they succeed, otherwise the problem. CallLimit limits the
+// time of each call to the session daemon.
 //
-//   make() -> start() -> stop() -> destroy()
+//   LttngTrace() -> start() -> stop() -> destroy()
 class LttngTrace {
  public:
-  // `name` is the session's, unique in the session daemon; `directory` is absolute and empty. What is
-  // referred to outlives the trace.
+  // `name` is the name of the session, unique in the session daemon. `directory` is an absolute path of an
+  // empty directory. The references must outlive the trace.
   LttngTrace(std::string name, std::string directory, SessionDaemon& daemon, TimerService& timers);
   LttngTrace(const LttngTrace&) = delete;
   LttngTrace& operator=(const LttngTrace&) = delete;
-  // Destroys a session that was not.
+  // Calls destroy() if it was not called.
   ~LttngTrace();
 
-  // Records what programs of this device pass of these signposts.
+  // Starts recording these signposts in all programs on this device.
   [[nodiscard]] std::string start(const std::set<std::string>& signposts);
-  // Afterwards everything is on the disk.
+  // Stops recording. When it has returned, all events are on the disk.
   [[nodiscard]] std::string stop();
-  // Also says what only shows now: a disk that was full, a writer that died, events that were lost.
+  // Destroys the session. It also reports problems that are known only now: a full disk, a dead writer
+  // process, or lost events.
   [[nodiscard]] std::string destroy();
 
-  // Whether the tracepoints of this very process have reached the session daemon: if not, other programs'
-  // need not have either.
+  // Waits until the session daemon knows the tracepoints of this process. If it does not, it may not know
+  // those of other programs either.
   [[nodiscard]] static std::string checkThisProcessIsSeen(SessionDaemon& daemon, TimerService& timers);
 
  private:
@@ -60,8 +61,9 @@ class LttngTrace {
   std::uint64_t lostEvents_ = 0;
 };
 
-// Conditions in LTTng's filter language, of which each event of these signposts, and no other, meets one:
-// several, because a long one is refused. No name holds a double quote, for which that language has no words.
+// Filters in LTTng's language. Each event of these signposts matches exactly one of them, and no other event
+// matches. There are several, because LTTng refuses a long filter. The names must not contain a double quote,
+// which the language cannot express.
 std::vector<std::string> filtersFor(const std::set<std::string>& signposts);
 
 }  // namespace tonewerk

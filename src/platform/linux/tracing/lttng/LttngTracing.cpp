@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Tracing in builds with LTTng.
+// Defines makeTracing() for builds with LTTng.
 
 #include "platform/linux/tracing/Tracing.h"
 #include "platform/linux/tracing/lttng/LttngRuntrace.h"

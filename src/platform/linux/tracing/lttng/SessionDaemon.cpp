@@ -33,10 +33,10 @@ constexpr milliseconds kPause{5};
 
 std::string systemText(int error) { return std::generic_category().message(error); }
 
-// In the child, between fork and exec: calls that are safe there, and no other. A failure's number goes to
-// `report`.
+// Runs in the child process. Between fork and exec it may only make calls that are safe there. It writes the
+// number of an error to `report`.
 [[noreturn]] void becomeSessionDaemon(int logFile, int report, char* const* environment) {
-  // Not to be left behind when we end unexpectedly.
+  // The kernel kills the session daemon if this daemon ends unexpectedly.
   ::prctl(PR_SET_PDEATHSIG, SIGKILL);
   sigset_t none;
   sigemptyset(&none);
@@ -56,8 +56,8 @@ std::string systemText(int error) { return std::generic_category().message(error
   ::_exit(127);
 }
 
-// This process's environment, and how long the session daemon waits for a program that does not answer, in
-// seconds: each such program delays every trace's start and stop by that.
+// Holds this process's environment and one more variable: how many seconds the session daemon waits for a
+// program that does not answer. Each such program delays the start and the stop of every trace by that time.
 class Environment {
  public:
   Environment() {
@@ -72,7 +72,7 @@ class Environment {
   std::vector<char*> pointers_;
 };
 
-// Waits until the process has ended, at most `timeout`; it is not reaped.
+// Waits at most `timeout` until the process has ended. waitpid() is still necessary afterwards.
 bool endsWithin(pid_t process, milliseconds timeout) {
   const auto end = Clock::now() + timeout;
   for (;;) {
@@ -98,7 +98,7 @@ bool SessionDaemon::isPrivate() const {
 
 std::string SessionDaemon::ensureRunning() {
   if (isPrivate() && hasEnded()) {
-    errorLog(log_, "the tracer's session daemon has ended: %@", lastWords());
+    errorLog(log_, "the tracer's session daemon has ended: %@", lastLogLine());
     end();
   }
   const int alive = lttng_session_daemon_alive();
@@ -142,7 +142,7 @@ std::string SessionDaemon::waitUntilItAnswers() {
   }
   const std::string problem = hasEnded() ? " ended at once: " : " does not answer: ";
   this->end();
-  return kProgram + problem + lastWords();
+  return kProgram + problem + lastLogLine();
 }
 
 bool SessionDaemon::hasEnded() {
@@ -159,7 +159,8 @@ void SessionDaemon::end() {
   if (process == 0) return;
   ::kill(process, SIGTERM);
   if (!endsWithin(process, kEndTimeout)) kill();
-  // Only here, under the lock, so that kill() never meets another process under this number.
+  // waitpid() is called under the lock, and nowhere else. So kill() cannot hit another process that got the
+  // same number.
   const MutexLock lock(mutex_);
   int status = 0;
   while (::waitpid(process, &status, 0) < 0 && errno == EINTR) {
@@ -172,8 +173,8 @@ void SessionDaemon::kill() {
   if (process_ != 0) ::kill(process_, SIGKILL);
 }
 
-// The last line that it wrote, which is why it ended when it ended by itself.
-std::string SessionDaemon::lastWords() const {
+// The last line of the session daemon's log. If it ended by itself, that line is the reason.
+std::string SessionDaemon::lastLogLine() const {
   std::string text;
   if (readTextFile(logPath_, text)) return "it has left no reason";
   while (!text.empty() && text.back() == '\n') text.pop_back();

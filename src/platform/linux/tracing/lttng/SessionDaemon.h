@@ -10,40 +10,40 @@ namespace tonewerk {
 
 class LogCategory;
 
-// LTTng's session daemon: the one that runs where this user's programs look for it, or else a private one,
-// started when it is first needed, and again when it has ended.
+// Provides LTTng's session daemon. If one is running that this user's programs connect to, that one is used.
+// Otherwise a private one is started when it is first needed, and again when it has ended.
 //
-// One thread, the one that talks to it, unless a member says otherwise. The private one ends with that
-// thread.
+// Only the thread that talks to the session daemon may call the functions, unless they say otherwise. The
+// kernel kills the private session daemon when that thread ends.
 class SessionDaemon {
  public:
-  // What the private one has to say goes to `logPath`.
+  // The private session daemon writes its errors to the file `logPath`. `log` must outlive this object.
   SessionDaemon(std::string logPath, const LogCategory& log);
   SessionDaemon(const SessionDaemon&) = delete;
   SessionDaemon& operator=(const SessionDaemon&) = delete;
-  // Ends the private one.
+  // Ends the private session daemon.
   ~SessionDaemon();
 
-  // Empty when one runs and answers, else why none does.
+  // Starts a session daemon if necessary. Empty if one is running and answers, otherwise the problem.
   [[nodiscard]] std::string ensureRunning();
 
-  // Whether the one in use was started here.
+  // Whether a private session daemon is in use.
   bool isPrivate() const;
-  // Ends the private one in order; at once when it takes more than some seconds.
+  // Asks the private session daemon to end, and kills it if that takes too long.
   void end();
-  // Any thread: ends the private one at once, which frees whoever waits for its answer.
+  // Any thread. Kills the private session daemon, so that calls that wait for its answer fail.
   void kill();
 
  private:
   [[nodiscard]] std::string startPrivate();
   [[nodiscard]] std::string waitUntilItAnswers();
   bool hasEnded();
-  std::string lastWords() const;
+  std::string lastLogLine() const;
 
   const std::string logPath_;
   const LogCategory& log_;
   mutable Mutex mutex_;
-  pid_t process_ GUARDED_BY(mutex_) = 0;  // the private one, not yet reaped; 0 for none
+  pid_t process_ GUARDED_BY(mutex_) = 0;  // of the private one until waitpid(); 0 for none
 };
 
 }  // namespace tonewerk

@@ -12,7 +12,7 @@ namespace {
 constexpr mode_t kMode = 0700;
 
 void removeAll(const std::filesystem::path& path) {
-  std::error_code error;  // what cannot be removed stays until the next start
+  std::error_code error;  // the next start tries to remove the rest
   std::filesystem::remove_all(path, error);
 }
 

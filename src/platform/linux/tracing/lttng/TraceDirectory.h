@@ -7,13 +7,14 @@
 
 namespace tonewerk {
 
-// A directory for one trace, removed with all that is in it when this goes.
+// Owns the directory of one trace. The destructor removes it with its contents.
 class TraceDirectory {
  public:
-  // Makes `name` in `parent`, which is made, too, when it is missing. Null, and `error` set, when that fails.
+  // Creates the directory `name` in `parent`, and `parent` if it is missing. Null, with `error` set, if that
+  // fails.
   [[nodiscard]] static std::shared_ptr<TraceDirectory> make(const std::string& parent,
                                                             const std::string& name, std::error_code& error);
-  // Removes what an earlier process left in `parent`.
+  // Removes all that an earlier process left in `parent`.
   static void removeLeftovers(const std::string& parent);
 
   explicit TraceDirectory(std::string path) : path_(std::move(path)) {}

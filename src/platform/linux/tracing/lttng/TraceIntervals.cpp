@@ -24,7 +24,7 @@ std::string unescaped(std::string_view text) {
   return name;
 }
 
-// Takes a whole decimal number off the front of `text`.
+// Parses a decimal number at the beginning of `text` and removes it.
 template <typename Number>
 bool takeNumber(std::string_view& text, Number& number) {
   const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), number);
@@ -35,7 +35,7 @@ bool takeNumber(std::string_view& text, Number& number) {
 
 class Parser {
  public:
-  // False when that is no line, or the last one.
+  // Parses a line with a name or an interval. False for any other line.
   bool take(std::string_view line) {
     if (line.starts_with(kName)) {
       byIndex_.push_back(&intervals_[unescaped(line.substr(kName.size()))]);
@@ -54,7 +54,8 @@ class Parser {
 
  private:
   TraceIntervals intervals_;
-  std::vector<std::vector<std::uint64_t>*> byIndex_;  // into intervals_, whose entries stay where they are
+  std::vector<std::vector<std::uint64_t>*>
+      byIndex_;  // point into intervals_; a map does not move its entries
 };
 
 }  // namespace

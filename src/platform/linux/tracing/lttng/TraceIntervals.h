@@ -11,11 +11,12 @@
 
 namespace tonewerk {
 
-// How long a trace's intervals took, in nanoseconds, by signpost, in the order in which they ended.
+// The durations of a trace's intervals in nanoseconds, by signpost, in the order in which the intervals
+// ended.
 using TraceIntervals = std::map<std::string, std::vector<std::uint64_t>, std::less<>>;
 
-// Reads what tw-trace-reader writes. None when it is anything else or not all of it; `problem` then says why,
-// in the reader's own words when it has some.
+// Parses the output of tw-trace-reader. None if it has another form or is incomplete; `problem` then says
+// why. If the reader reported a problem itself, `problem` is its text.
 [[nodiscard]] std::optional<TraceIntervals> parseTraceIntervals(std::string_view text, std::string& problem);
 
 }  // namespace tonewerk

@@ -46,7 +46,7 @@ std::unique_ptr<KolviModel> TraceReaderKolvi::openModel(const std::string& trace
                                                         std::string& problem) {
   const BoundedCommand::Result result =
       BoundedCommand({readerPath_, traceLocation}, {.time = timeout_, .bytes = kMaxBytes}).run();
-  // A reader that ended badly may have said why before.
+  // A reader that failed may have written the reason before.
   auto intervals = parseTraceIntervals(result.output, problem);
   if (!intervals && result.end != BoundedCommand::End::kExited)
     problem = "tw-trace-reader: " + result.problem;

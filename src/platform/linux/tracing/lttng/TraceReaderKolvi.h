@@ -9,14 +9,14 @@
 
 namespace tonewerk {
 
-// Reads traces in a process of its own, tw-trace-reader, within bounds of time and size: a damaged trace may
-// hang or end whoever reads it.
+// Reads traces in a separate process, tw-trace-reader, with limits to its time and output. A damaged trace
+// can make its reader hang or crash.
 //
-// A trace is only good with the daemon's own signpost at its beginning and its end (see LttngRuntrace).
+// A trace is valid only if the daemon's own signpost is at its beginning and its end (see LttngRuntrace).
 class TraceReaderKolvi final : public Kolvi {
  public:
   static constexpr std::chrono::seconds kTimeout{60};
-  static constexpr std::size_t kMaxBytes = std::size_t{512} << 20;  // some 30 million intervals
+  static constexpr std::size_t kMaxBytes = std::size_t{512} << 20;  // about 30 million intervals
 
   explicit TraceReaderKolvi(std::string readerPath, std::chrono::milliseconds timeout = kTimeout);
 

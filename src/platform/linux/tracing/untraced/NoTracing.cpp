@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Tracing in builds without LTTng.
+// Defines makeTracing() for builds without LTTng.
 
 #include "platform/linux/tracing/UnavailableTracing.h"
 
