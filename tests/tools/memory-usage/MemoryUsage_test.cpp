@@ -128,7 +128,7 @@ TEST_F(MemoryUsageTest, ThreadsOfTheKernelAndProcessesThatHaveEndedAreLeftOut) {
   EXPECT_EQ(snapshot.unreadable, 0U);
 }
 
-TEST_F(MemoryUsageTest, AProcessThatVanishesMeanwhileIsLeftOut) {
+TEST_F(MemoryUsageTest, AProcessThatEndsMeanwhileIsLeftOut) {
   std::filesystem::create_directories(directory.path("7"));  // gone before its first file was read
   write("8/status", statusOf("halfway", 100));               // gone before its second
   const UsageSnapshot snapshot = read();
@@ -136,7 +136,7 @@ TEST_F(MemoryUsageTest, AProcessThatVanishesMeanwhileIsLeftOut) {
   EXPECT_EQ(snapshot.unreadable, 0U);
 }
 
-TEST_F(MemoryUsageTest, AProcessThatCannotBeReadIsCountedAndSaid) {
+TEST_F(MemoryUsageTest, AnUnreadableProcessIsCountedAndReported) {
   addProcess(42, "readable", 100);
   std::filesystem::create_directories(directory.path("7/status"));  // not even root can read that
   write("8/status", statusOf("odd", 100));

@@ -72,7 +72,7 @@ TEST_F(SignpostPairsTest, ThreadsAndProcessesAreKeptApart) {
   EXPECT_THAT(intervals(), ElementsAre(Pair("a", 9), Pair("a", 20), Pair("a", 28)));
 }
 
-TEST_F(SignpostPairsTest, WhatTheTracesEdgesCutIsLeftOut) {
+TEST_F(SignpostPairsTest, IncompleteIntervalsAreLeftOut) {
   end("begun before", 5);
   begin("a", 10);
   end("a", 20);
@@ -102,7 +102,7 @@ TEST_F(SignpostPairsTest, HoldsABoundedNumberOfOpenIntervals) {
   EXPECT_FALSE(pairs_.add({true, "b", 0, 1, 1, 0}));
 }
 
-TEST_F(SignpostPairsTest, NothingMakesNothing) {
+TEST_F(SignpostPairsTest, NoEventsGiveNoIntervals) {
   EXPECT_THAT(pairs_.names(), IsEmpty());
   EXPECT_THAT(pairs_.intervals(), IsEmpty());
 }

@@ -117,7 +117,7 @@ class ChanmeterContract : public testing::Test {
 using Sources = testing::Types<PublishedInFiles, SetByTheTest>;
 TYPED_TEST_SUITE(ChanmeterContract, Sources);
 
-TYPED_TEST(ChanmeterContract, HasAnEmptySetWhereNoChannelMatches) {
+TYPED_TEST(ChanmeterContract, HasAnEmptySetIfNoChannelMatches) {
   EXPECT_EQ(this->chanmeter().channelCount(*this->channelsIn("Speaker", std::nullopt)), 0);
   this->source_.setRecords({simple(channels::speaker("Volts"), 1)});
   EXPECT_EQ(this->chanmeter().channelCount(*this->channelsIn("Tx", std::nullopt)), 0);

@@ -95,7 +95,7 @@ TEST(ChannelFileTest, KnowsTheFormatsByName) {
   }
 }
 
-TEST(ChannelFileTest, LeavesAloneWhatAFormatDoesNotUse) {
+TEST(ChannelFileTest, IgnoresFieldsThatAFormatDoesNotUse) {
   const auto records = recordsOf(fileOf(
       R"({"group": "g", "name": "n", "format": "vector", "value": [1, {}], "note": null, "min": "low"})"));
   EXPECT_THAT(records, SizeIs(1));
@@ -213,7 +213,7 @@ TEST(ChannelFileTest, NamesLineAndColumnOfWhatIsNoJson) {
   EXPECT_THAT(problemOf(fileOf("// none")), StartsWith("line 1, column "));
 }
 
-TEST(ChannelFileTest, SaysLittleOfLongText) {
+TEST(ChannelFileTest, ShortensTheProblemOfALongText) {
   ChannelFileProblem problem;
   EXPECT_FALSE(ChannelFile::parse("{\"" + std::string(1 << 19, 'x') + "\" 7", problem));
   EXPECT_LT(problem.text.size(), 200U);

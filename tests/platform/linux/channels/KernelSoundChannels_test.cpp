@@ -103,7 +103,7 @@ TEST_F(KernelSoundChannelsTest, AddsAStateThatItDoesNotKnow) {
   EXPECT_EQ(readGroup("Tx").at(2).states.back(), (ChanmeterState{"NAPPING", 0, 2000, 1.0}));
 }
 
-TEST_F(KernelSoundChannelsTest, GivesZerosForASubstreamThatNobodyHasOpen) {
+TEST_F(KernelSoundChannelsTest, GivesZerosForAClosedSubstream) {
   const auto records = readGroup("Tx");
   EXPECT_EQ(records[3].value, 0);
   EXPECT_EQ(records[4].value, 0);
@@ -132,7 +132,7 @@ TEST_F(KernelSoundChannelsTest, FollowsTheSubstreams) {
 }
 
 // Each running session holds a snapshot: thousands of them cost little while nothing plays.
-TEST_F(KernelSoundChannelsTest, SharesTheRecordsOfWhatDidNotChange) {
+TEST_F(KernelSoundChannelsTest, SharesTheRecordsOfUnchangedChannels) {
   const std::optional<std::string> group = "Tx";
   const std::optional<std::string> subGroup;
   const ChannelChoice playback(group, subGroup);
@@ -167,14 +167,14 @@ TEST_F(KernelSoundChannelsTest, HasNoPowerWhereItIsNotManaged) {
   EXPECT_FALSE(error_);
 }
 
-TEST_F(KernelSoundChannelsTest, GoesByTheNumberOfACardWithoutIdentifier) {
+TEST_F(KernelSoundChannelsTest, UsesTheNumberOfACardWithoutIdentifier) {
   std::filesystem::remove(tree_.path("proc/asound/card1/id"));
   EXPECT_THAT(namesOf(readGroup("Speaker")), ElementsAre("PCH Speaker Power", "Headset Speaker Power"));
   std::filesystem::remove(tree_.path("sys/class/sound/card1/id"));
   EXPECT_THAT(namesOf(readGroup("Speaker")), ElementsAre("PCH Speaker Power", "card1 Speaker Power"));
 }
 
-TEST_F(KernelSoundChannelsTest, SaysOnceWhatItDoesNotUnderstandAndLeavesItOut) {
+TEST_F(KernelSoundChannelsTest, LogsAnUnknownFormOnceAndLeavesItOut) {
   tree_.setStatus("nonsense\n");
   tree_.addCard(1, "Headset", "active", "soon", "900");
   for (int time = 0; time < 2; ++time) {
@@ -191,7 +191,7 @@ TEST_F(KernelSoundChannelsTest, SaysOnceWhatItDoesNotUnderstandAndLeavesItOut) {
                       ": has no times in milliseconds (failure 10; the channels concerned are left out)"));
 }
 
-TEST_F(KernelSoundChannelsTest, ReadsSubstreamsUpToTheBoundAndNotPastIt) {
+TEST_F(KernelSoundChannelsTest, ReadsSubstreamsUpToTheLimit) {
   for (std::size_t number = 0; number < KernelSoundChannels::kMaxSubstreams - 4; ++number) {
     tree_.addSubstream("card2/pcm0c/sub" + std::to_string(number), "closed\n", "closed\n");
   }
@@ -203,7 +203,7 @@ TEST_F(KernelSoundChannelsTest, ReadsSubstreamsUpToTheBoundAndNotPastIt) {
   EXPECT_THAT(errors(), SizeIs(1));
 }
 
-TEST_F(KernelSoundChannelsTest, PassesOverNamesThatOnlyLookLikeIts) {
+TEST_F(KernelSoundChannelsTest, IgnoresSimilarNames) {
   for (const char* name : {"card", "cardX", "card1x", "card-1", "card99999999999"}) {
     tree_.write(std::string("proc/asound/") + name + "/pcm0p/sub0/status", "closed\n");
   }

@@ -93,7 +93,7 @@ TEST_F(LinuxChanmeterTest, TellsWhatChangedBetweenTwoTimes) {
               testing::IsSupersetOf({"PCH Hardware Position=48000", "PCH Delay=60", "Amp n=7"}));
 }
 
-TEST_F(LinuxChanmeterTest, DoesNotSeeADriverThatCameAfterTheSubscription) {
+TEST_F(LinuxChanmeterTest, DoesNotReadADriverThatIsNewerThanTheSubscription) {
   publishValue("Amp", "pdm", 5);
   const auto channels = channelsIn("pdm");
   publishValue("Other", "pdm", 5);
@@ -125,7 +125,7 @@ TEST_F(LinuxChanmeterTest, GivesNoSamplesWhenNothingCouldBeRead) {
   EXPECT_EQ(code(), 0);
 }
 
-TEST_F(LinuxChanmeterTest, GivesASetBesideAnError) {
+TEST_F(LinuxChanmeterTest, GivesASetTogetherWithAnError) {
   publishValue("Amp", "pdm", 5);
   publish("Bad.json", "[]");
   const auto channels = channelsIn("pdm");

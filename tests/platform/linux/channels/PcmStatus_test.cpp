@@ -34,7 +34,7 @@ TEST(PcmStatusTest, ReadsARunningSubstream) {
   EXPECT_EQ(status->stateMilliseconds, 27845U);
 }
 
-TEST(PcmStatusTest, ReadsOneThatNobodyHasOpen) {
+TEST(PcmStatusTest, ReadsAClosedSubstream) {
   const auto status = PcmStatus::parse("closed\n", "closed\n");
   ASSERT_TRUE(status);
   EXPECT_EQ(status->state, "closed");
@@ -54,11 +54,11 @@ TEST(PcmStatusTest, TakesTimesOfFewAndOfManyDigits) {
   EXPECT_EQ(millisecondsOf(statusWith("PAUSED", "10", "12.25")), 2250U);
 }
 
-TEST(PcmStatusTest, TakesNoTimeFromAClockThatWentBack) {
+TEST(PcmStatusTest, GivesZeroIfTheClockWentBack) {
   EXPECT_EQ(millisecondsOf(statusWith("RUNNING", "30.0", "20.0")), 0U);
 }
 
-TEST(PcmStatusTest, GoesByThePositionWhereNobodyTakesTimeStamps) {
+TEST(PcmStatusTest, UsesThePositionWithoutTimeStamps) {
   EXPECT_EQ(millisecondsOf(statusWith("RUNNING", "20431.373104146", "0.000000000", "72000")), 1500U);
   EXPECT_EQ(millisecondsOf(statusWith("DRAINING", "20431.373104146", "0.000000000", "72000")), 0U);
   EXPECT_EQ(millisecondsOf(statusWith("RUNNING", "1.0", "0.0", "72000"), "closed\n"), 0U);
@@ -66,13 +66,13 @@ TEST(PcmStatusTest, GoesByThePositionWhereNobodyTakesTimeStamps) {
   EXPECT_EQ(millisecondsOf(statusWith("RUNNING", "1.0", "0.0", "-72000")), 0U);
 }
 
-TEST(PcmStatusTest, BelievesNoTimesBeyondReason) {
+TEST(PcmStatusTest, IgnoresTimesOutOfRange) {
   EXPECT_EQ(millisecondsOf(statusWith("PAUSED", "1.0", "9223372036854775807.9")), 0U);
   EXPECT_EQ(millisecondsOf(statusWith("PAUSED", "-5.0", "x")), 0U);
   EXPECT_GT(millisecondsOf(statusWith("RUNNING", "0.0", "0.0", "9223372036854775807")), 0U);
 }
 
-TEST(PcmStatusTest, RefusesWhatHasAnotherForm) {
+TEST(PcmStatusTest, RefusesOtherForms) {
   for (const char* text : {"", "\n", "open", "state: RUNNING\n", "state: RUNNING\nhw_ptr : 1\n",
                            "state: \nhw_ptr : 1\ndelay : 1\n", "hw_ptr : 1\ndelay : 1\n",
                            "state: RUNNING\nhw_ptr : 9223372036854775808\ndelay : 1\n",

@@ -89,7 +89,7 @@ TEST_F(PublishedChannelsTest, HasNothingWithoutADirectory) {
   EXPECT_THAT(errors(), IsEmpty());
 }
 
-TEST_F(PublishedChannelsTest, SaysWhatKeepsItFromTheDirectory) {
+TEST_F(PublishedChannelsTest, LogsWhyTheDirectoryCannotBeRead) {
   std::filesystem::remove(channels());
   std::ofstream(channels()) << "a file";
   EXPECT_THAT(readAll(), IsEmpty());
@@ -104,7 +104,7 @@ TEST_F(PublishedChannelsTest, ReadsFilesInTheOrderOfTheirNames) {
   EXPECT_EQ(code(), 0);
 }
 
-TEST_F(PublishedChannelsTest, PassesOverOtherNames) {
+TEST_F(PublishedChannelsTest, IgnoresOtherNames) {
   for (const char* name : {"a.txt", ".a.json", ".json", "json", "a.json.new", "a.JSON"}) {
     publish(name, fileOf("A", channelOf("x")));
   }
@@ -122,7 +122,7 @@ TEST_F(PublishedChannelsTest, GivesTheChosenChannelsOnly) {
   EXPECT_EQ(code(), 0);
 }
 
-TEST_F(PublishedChannelsTest, FollowsFilesThatComeGoAndChange) {
+TEST_F(PublishedChannelsTest, NoticesNewRemovedAndChangedFiles) {
   publish("a.json", fileOf("A", channelOf("x", 1)));
   EXPECT_THAT(namesOf(readAll()), ElementsAre("A x=1"));
   publish("a.json", fileOf("A", channelOf("x", 2)));
@@ -156,7 +156,7 @@ TEST_F(PublishedChannelsTest, LeavesOutTheDriverWhoseFileIsWrongAndNoOther) {
                   path("c.json") + ": /channels/1/value is missing (failure 5" + kLeftOut));
 }
 
-TEST_F(PublishedChannelsTest, SaysAFailureOnceUntilItChanges) {
+TEST_F(PublishedChannelsTest, LogsAFailureOnceUntilItChanges) {
   publish("a.json", fileOf("A", "7"));
   readAll();
   EXPECT_THAT(readAll(), IsEmpty());
@@ -201,7 +201,7 @@ TEST_F(PublishedChannelsTest, ReadsAFileOfOneMebibyteAndNoneLarger) {
   EXPECT_THAT(errors(), ElementsAre(path("a.json") + ": is larger than 1 MiB (failure 3" + kLeftOut));
 }
 
-TEST_F(PublishedChannelsTest, NeitherHangsNorStumblesOverWhatIsNoRegularFile) {
+TEST_F(PublishedChannelsTest, LeavesOutOtherThanRegularFiles) {
   ASSERT_EQ(mkfifo(path("a.json").c_str(), 0600), 0);
   std::filesystem::create_directory(path("b.json"));
   std::filesystem::create_symlink("c.json", path("c.json"));
@@ -220,7 +220,7 @@ TEST_F(PublishedChannelsTest, NeitherHangsNorStumblesOverWhatIsNoRegularFile) {
                           HasSubstr(path("e.json") + ": ")));
 }
 
-TEST_F(PublishedChannelsTest, SaysWhatKeepsItFromAFile) {
+TEST_F(PublishedChannelsTest, LogsWhyAFileCannotBeRead) {
   if (geteuid() == 0) GTEST_SKIP() << "root may read everything";
   publish("a.json", fileOf("A", channelOf("x")));
   std::filesystem::permissions(path("a.json"), std::filesystem::perms::none);
@@ -235,7 +235,7 @@ TEST_F(PublishedChannelsTest, FollowsALinkToAFile) {
   EXPECT_THAT(namesOf(readAll()), ElementsAre("A x=1"));
 }
 
-TEST_F(PublishedChannelsTest, ReadsFilesUpToTheirBoundAndNotPastIt) {
+TEST_F(PublishedChannelsTest, ReadsFilesUpToTheLimit) {
   for (std::size_t number = 0; number < PublishedChannels::kMaxFiles; ++number) {
     const std::string digits = std::to_string(1000 + number);
     publish(digits + ".json", fileOf(digits, channelOf("x")));
@@ -251,7 +251,7 @@ TEST_F(PublishedChannelsTest, ReadsFilesUpToTheirBoundAndNotPastIt) {
                                     kLeftOut));
 }
 
-TEST_F(PublishedChannelsTest, LooksAtEntriesUpToTheirBoundAndNotPastIt) {
+TEST_F(PublishedChannelsTest, ReadsEntriesUpToTheLimit) {
   for (std::size_t number = 0; number < PublishedChannels::kMaxEntries; ++number) {
     std::ofstream(path(std::to_string(number)));
   }
@@ -266,7 +266,7 @@ TEST_F(PublishedChannelsTest, LooksAtEntriesUpToTheirBoundAndNotPastIt) {
                                     kLeftOut));
 }
 
-TEST_F(PublishedChannelsTest, ReadsBytesUpToTheirBoundAndNotPastIt) {
+TEST_F(PublishedChannelsTest, ReadsBytesUpToTheLimit) {
   std::string text = fileOf("A", channelOf("x"));
   text.resize(PublishedChannels::kMaxFileBytes, ' ');
   const std::size_t files = PublishedChannels::kMaxBytes / PublishedChannels::kMaxFileBytes;
@@ -286,7 +286,7 @@ TEST_F(PublishedChannelsTest, ReadsBytesUpToTheirBoundAndNotPastIt) {
 }
 
 // Or else files that are put before one another, with readings in between, are all held at once.
-TEST_F(PublishedChannelsTest, LetsGoOfAFileThatOthersHavePushedPastTheBound) {
+TEST_F(PublishedChannelsTest, FreesAFileThatIsBeyondTheLimitNow) {
   publish("z.json", fileOf("Z", channelOf("x")));
   const std::weak_ptr<const ChanmeterRecord> record = readAll().at(0);
   EXPECT_FALSE(record.expired());
@@ -301,7 +301,7 @@ TEST_F(PublishedChannelsTest, LetsGoOfAFileThatOthersHavePushedPastTheBound) {
   EXPECT_EQ(namesOf(readAll()).back(), "Z x=1");
 }
 
-TEST_F(PublishedChannelsTest, GivesChannelsUpToTheirBoundAndNotPastIt) {
+TEST_F(PublishedChannelsTest, GivesChannelsUpToTheLimit) {
   publish("a.json", manyChannels(PublishedChannels::kMaxChannels / 2));
   publish("b.json", manyChannels(PublishedChannels::kMaxChannels / 2));
   EXPECT_THAT(readAll(), SizeIs(PublishedChannels::kMaxChannels));

@@ -55,14 +55,14 @@ TEST_F(CapturePolicyTest, ADayBeginsAtMidnightInUtcWhateverTheTimeZone) {
   EXPECT_EQ(policy.count(), (CapturePolicy::Count{kToday + 1, 1}));
 }
 
-TEST_F(CapturePolicyTest, GoesOnWithWhatAnEarlierProcessCounted) {
+TEST_F(CapturePolicyTest, ContinuesTheCountOfAnEarlierProcess) {
   CapturePolicy later(clock, {kToday, 19});
   EXPECT_EQ(later.judge(signatureOf("a"), 0.0), kFaultsignErrorNone);
   later.accept(signatureOf("a"));
   EXPECT_EQ(later.judge(signatureOf("b"), 0.0), kFaultsignErrorDailyLimitExceeded);
 }
 
-TEST_F(CapturePolicyTest, WhatWasCountedOnAnotherDayDoesNotMatter) {
+TEST_F(CapturePolicyTest, TheCountOfAnotherDayDoesNotMatter) {
   for (const std::int64_t day : {kToday - 1, kToday + 1}) {  // the later one when the clock went back
     CapturePolicy later(clock, {day, 20});
     EXPECT_EQ(later.judge(signatureOf("a"), 0.0), kFaultsignErrorNone);
@@ -70,7 +70,7 @@ TEST_F(CapturePolicyTest, WhatWasCountedOnAnotherDayDoesNotMatter) {
   }
 }
 
-TEST_F(CapturePolicyTest, CountsNothingThatItRefuses) {
+TEST_F(CapturePolicyTest, DoesNotCountRefusedRequests) {
   ask(1);
   ask(1);
   ask(signatureOf("other"), -1.0);
@@ -93,7 +93,7 @@ TEST_F(CapturePolicyTest, TakesTheSameAgainAfterTheIntervalAndNotBefore) {
   EXPECT_EQ(ask(1), kFaultsignErrorNone);
 }
 
-TEST_F(CapturePolicyTest, ARefusalDoesNotPutTheNextOff) {
+TEST_F(CapturePolicyTest, ARefusalDoesNotDelayTheNextCapture) {
   ask(1);
   clock.advance(std::chrono::seconds(40));
   EXPECT_EQ(ask(1), kFaultsignErrorRequestThrottled);
@@ -124,7 +124,7 @@ TEST_F(CapturePolicyTest, EveryPartOfASignatureTellsItFromOthers) {
   EXPECT_EQ(ask({"a", "b", "c", "d", "e", ValueMap{{"level", 1}}}), kFaultsignErrorRequestThrottled);
 }
 
-TEST_F(CapturePolicyTest, OneThatIsWithdrawnPutsNothingOffAndCountsForTheDay) {
+TEST_F(CapturePolicyTest, AWithdrawnCaptureDelaysNothingAndCountsForTheDay) {
   const FaultsignSignature signature = signatureOf("alarms");
   const CapturePolicy::Acceptance acceptance = policy.accept(signature);
   EXPECT_EQ(policy.judge(signature, 0.0), kFaultsignErrorRequestThrottled);
@@ -133,7 +133,7 @@ TEST_F(CapturePolicyTest, OneThatIsWithdrawnPutsNothingOffAndCountsForTheDay) {
   EXPECT_EQ(policy.count().accepted, 2);
 }
 
-TEST_F(CapturePolicyTest, OneThatIsWithdrawnLateLeavesTheNewerOneOfItsSignature) {
+TEST_F(CapturePolicyTest, ALateWithdrawalKeepsTheNewerAcceptance) {
   const FaultsignSignature signature = signatureOf("alarms");
   const CapturePolicy::Acceptance older = policy.accept(signature);
   clock.advance(CapturePolicy::kMinimumInterval);
@@ -142,7 +142,7 @@ TEST_F(CapturePolicyTest, OneThatIsWithdrawnLateLeavesTheNewerOneOfItsSignature)
   EXPECT_EQ(ask(signature), kFaultsignErrorRequestThrottled);
 }
 
-TEST_F(CapturePolicyTest, WithdrawingLeavesOtherSignaturesAlone) {
+TEST_F(CapturePolicyTest, AWithdrawalDoesNotChangeOtherSignatures) {
   const CapturePolicy::Acceptance acceptance = policy.accept(signatureOf("alarms"));
   EXPECT_EQ(ask(signatureOf("music")), kFaultsignErrorNone);
   policy.withdraw(signatureOf("alarms"), acceptance);
@@ -158,7 +158,7 @@ TEST_F(CapturePolicyTest, TakesDurationsFromZeroToADay) {
   EXPECT_EQ(ask(signatureOf("a day"), 86'400.0), kFaultsignErrorNone);
 }
 
-TEST_F(CapturePolicyTest, RefusesDurationsThatAreNone) {
+TEST_F(CapturePolicyTest, RefusesInvalidDurations) {
   constexpr double kInfinity = std::numeric_limits<double>::infinity();
   for (const double duration : {-0.001, 86'400.001, 1.7976931348623157e308, kInfinity, -kInfinity,
                                 std::numeric_limits<double>::quiet_NaN()}) {
@@ -174,7 +174,7 @@ TEST_F(CapturePolicyTest, RefusesASignatureWithoutDomainTypeOrSubtype) {
   EXPECT_EQ(ask({"a", "b", "c", "", std::nullopt, std::nullopt}), kFaultsignErrorNone);
 }
 
-TEST_F(CapturePolicyTest, SaysOfInvalidParametersThatTheyAreAlsoWhenTheDayIsOver) {
+TEST_F(CapturePolicyTest, InvalidParametersTakePrecedenceOverTheDailyLimit) {
   acceptedOf(20);
   EXPECT_EQ(ask(FaultsignSignature{}), kFaultsignErrorInvalidParameters);
 }

@@ -63,7 +63,7 @@ TEST_F(CaptureSessionsTest, AnImmediateCaptureIsMadeAtOnce) {
   EXPECT_EQ(timers.count(), 0U);
 }
 
-TEST_F(CaptureSessionsTest, OneWithADurationIsMadeOnceWhenThatHasPassed) {
+TEST_F(CaptureSessionsTest, ACaptureWithADurationIsMadeOnceAfterIt) {
   const CaptureSessions::Outcome outcome = start(60.0);
   EXPECT_EQ(outcome.error, kFaultsignErrorNone);
   clock.advance(std::chrono::milliseconds(59'999));
@@ -84,7 +84,7 @@ TEST_F(CaptureSessionsTest, ADurationIsRoundedUpToWholeMilliseconds) {
   EXPECT_THAT(made, SizeIs(2));
 }
 
-TEST_F(CaptureSessionsTest, OneThatWasCancelledIsNeverMade) {
+TEST_F(CaptureSessionsTest, ACancelledCaptureIsNeverMade) {
   const CaptureSessions::Outcome kept = start(60.0);
   const CaptureSessions::Outcome cancelled = start(60.0);
   clock.advance(59.0);
@@ -94,7 +94,7 @@ TEST_F(CaptureSessionsTest, OneThatWasCancelledIsNeverMade) {
   EXPECT_THAT(madeIdentifiers(), ElementsAre(kept.identifier));
 }
 
-TEST_F(CaptureSessionsTest, OnlyWhatIsPendingCanBeCancelled) {
+TEST_F(CaptureSessionsTest, OnlyPendingCapturesCanBeCancelled) {
   EXPECT_FALSE(sessions->cancel("NONE_RETURNED"));
   EXPECT_FALSE(sessions->cancel(""));
   EXPECT_FALSE(sessions->cancel(snapshot().identifier));
@@ -112,7 +112,7 @@ TEST_F(CaptureSessionsTest, ADaysCapturesMayAllBePending) {
   EXPECT_THAT(made, SizeIs(20));
 }
 
-TEST_F(CaptureSessionsTest, SoManyMayBePendingAndNoMoreUntilOneIsGone) {
+TEST_F(CaptureSessionsTest, TheNumberOfPendingCapturesIsLimited) {
   std::string first;
   for (std::size_t n = 0; n < CaptureSessions::kMaxPending; ++n) {
     // Another day by the wall clock, to which it jumped.
@@ -129,7 +129,7 @@ TEST_F(CaptureSessionsTest, SoManyMayBePendingAndNoMoreUntilOneIsGone) {
   EXPECT_EQ(start(60.0).error, kFaultsignErrorNone);
 }
 
-TEST_F(CaptureSessionsTest, WhatThePolicyRefusesIsNeitherMadeNorPending) {
+TEST_F(CaptureSessionsTest, ARefusedCaptureIsNeitherMadeNorPending) {
   EXPECT_EQ(sessions->snapshot(requestOf("", 0.0)).error, kFaultsignErrorInvalidParameters);
   EXPECT_EQ(sessions->start(requestOf("a", -1.0)).error, kFaultsignErrorInvalidParameters);
   EXPECT_EQ(sessions->start(requestOf("a", 60.0)).error, kFaultsignErrorNone);
@@ -140,7 +140,7 @@ TEST_F(CaptureSessionsTest, WhatThePolicyRefusesIsNeitherMadeNorPending) {
   EXPECT_THAT(made, IsEmpty());
 }
 
-TEST_F(CaptureSessionsTest, ACancelledOneCountsForTheDayAndNotForTheInterval) {
+TEST_F(CaptureSessionsTest, ACancelledCaptureCountsForTheDayAndNotForTheInterval) {
   const CaptureSessions::Outcome outcome = sessions->start(requestOf("a", 60.0));
   EXPECT_TRUE(sessions->cancel(outcome.identifier));
   EXPECT_EQ(sessions->count().accepted, 1);
@@ -148,14 +148,14 @@ TEST_F(CaptureSessionsTest, ACancelledOneCountsForTheDayAndNotForTheInterval) {
   EXPECT_EQ(sessions->count().accepted, 2);
 }
 
-TEST_F(CaptureSessionsTest, CancellingWhatIsMadeAlreadyDoesNotLetTheSameInSooner) {
+TEST_F(CaptureSessionsTest, CancellingAMadeCaptureDoesNotShortenTheInterval) {
   const std::string due = sessions->start(requestOf("a", 1.0)).identifier;
   clock.advance(1.0);
   EXPECT_FALSE(sessions->cancel(due));
   EXPECT_EQ(sessions->start(requestOf("a", 1.0)).error, kFaultsignErrorRequestThrottled);
 }
 
-TEST_F(CaptureSessionsTest, ACaptureThatFindsNoRoomDoesNotCount) {
+TEST_F(CaptureSessionsTest, ACaptureWithoutRoomDoesNotCount) {
   hasRoom = false;
   EXPECT_EQ(sessions->snapshot(requestOf("a", 0.0)).error, kFaultsignErrorServiceUnavailable);
   EXPECT_EQ(sessions->count().accepted, 0);
@@ -163,7 +163,7 @@ TEST_F(CaptureSessionsTest, ACaptureThatFindsNoRoomDoesNotCount) {
   EXPECT_EQ(sessions->snapshot(requestOf("a", 0.0)).error, kFaultsignErrorNone);
 }
 
-TEST_F(CaptureSessionsTest, APendingOneThatFindsNoRoomIsOver) {
+TEST_F(CaptureSessionsTest, APendingCaptureWithoutRoomIsDropped) {
   const std::string identifier = start(1.0).identifier;
   hasRoom = false;
   clock.advance(1.0);
@@ -171,7 +171,7 @@ TEST_F(CaptureSessionsTest, APendingOneThatFindsNoRoomIsOver) {
   EXPECT_EQ(timers.count(), 0U);
 }
 
-TEST_F(CaptureSessionsTest, TheEndDropsWhatIsPendingAndTakesNoMore) {
+TEST_F(CaptureSessionsTest, FinishDropsPendingCapturesAndAcceptsNoMore) {
   const std::string first = start(60.0).identifier;
   const std::string second = start(30.0).identifier;
   EXPECT_THAT(sessions->finish(), ElementsAre(first, second));

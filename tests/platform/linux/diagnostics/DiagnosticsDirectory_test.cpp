@@ -38,7 +38,7 @@ class DiagnosticsDirectoryTest : public testing::Test {
   DiagnosticsDirectory items{root.path("state")};
 };
 
-TEST_F(DiagnosticsDirectoryTest, IsEmptyWhereNothingIs) {
+TEST_F(DiagnosticsDirectoryTest, IsEmptyWithoutItems) {
   EXPECT_THAT(items.listAll(), IsEmpty());
   EXPECT_EQ(items.sweep(), 0u);
   EXPECT_FALSE(items.contains(DiagnosticKind::kCapture, "a"));
@@ -70,7 +70,7 @@ TEST_F(DiagnosticsDirectoryTest, ListsOldestFirstOverAllKinds) {
   EXPECT_THAT(names(items.list(DiagnosticKind::kCapture)), ElementsAre("old", "new"));
 }
 
-TEST_F(DiagnosticsDirectoryTest, LeadsNowhereElse) {
+TEST_F(DiagnosticsDirectoryTest, NamesDoNotLeadOutOfTheDirectory) {
   put("secret/request.json", "secret");
   put("state/captures/item/request.json", "{}");
   fs::create_directory_symlink(root.path("secret"), root.path("state/captures/link"));
@@ -88,7 +88,7 @@ TEST_F(DiagnosticsDirectoryTest, LeadsNowhereElse) {
   EXPECT_TRUE(fs::exists(root.path("secret/request.json")));
 }
 
-TEST_F(DiagnosticsDirectoryTest, RemovesLinksInAnItemNotWhatTheyLeadTo) {
+TEST_F(DiagnosticsDirectoryTest, RemovesLinksInAnItemButNotTheirTargets) {
   put("secret/request.json", "secret");
   put("state/captures/item/request.json", "{}");
   fs::create_directory_symlink(root.path("secret"), root.path("state/captures/item/link"));
@@ -114,13 +114,13 @@ TEST_F(DiagnosticsDirectoryTest, ReplacesNothing) {
   EXPECT_TRUE(fs::is_regular_file(root.path("state/captures/file")));
 }
 
-TEST_F(DiagnosticsDirectoryTest, LeavesNothingOfWhatFailed) {
+TEST_F(DiagnosticsDirectoryTest, LeavesNothingAfterAFailure) {
   // Two files of one name: the second cannot be made.
   EXPECT_EQ(items.write(DiagnosticKind::kCapture, "item", {{"a", "1"}, {"a", "2"}}), std::errc::file_exists);
   EXPECT_TRUE(fs::is_empty(root.path("state/captures")));
 }
 
-TEST_F(DiagnosticsDirectoryTest, SweepsWhatACrashLeft) {
+TEST_F(DiagnosticsDirectoryTest, SweepsLeftoversOfACrash) {
   put("state/captures/.item.new/request.json", "{");
   put("state/whirlcaps/.item.old/request.json", "{}");
   put("state/whirlcaps/item/request.json", "{}");

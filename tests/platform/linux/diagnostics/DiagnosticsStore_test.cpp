@@ -169,7 +169,7 @@ TEST_F(DiagnosticsStoreTest, NamesItemsByTimeAlsoTwoOfTheSameInstant) {
   EXPECT_EQ(addAndTake({DiagnosticKind::kWhirlcap}).name, "20251120T101800.250Z");
 }
 
-TEST_F(DiagnosticsStoreTest, NamesWhatFailedAndKeepsTheRest) {
+TEST_F(DiagnosticsStoreTest, NamesFailedCollectorsAndKeepsTheOtherFiles) {
   collectors = {std::make_shared<FixedCollector>("a.txt", DiagnosticCollector::Result{"", "no such file"}),
                 std::make_shared<FixedCollector>("b.txt", DiagnosticCollector::Result{"half", "ended early"}),
                 std::make_shared<FixedCollector>("c.txt", DiagnosticCollector::Result{"whole", ""})};
@@ -182,7 +182,7 @@ TEST_F(DiagnosticsStoreTest, NamesWhatFailedAndKeepsTheRest) {
   EXPECT_EQ(items.readFile(DiagnosticKind::kWhirlcap, name, "b.txt"), "half");
 }
 
-TEST_F(DiagnosticsStoreTest, CutsWhatACollectorGivesBeyondItsBound) {
+TEST_F(DiagnosticsStoreTest, CutsAFileThatIsBeyondTheLimit) {
   collectors = {
       std::make_shared<FixedCollector>("at.txt", DiagnosticCollector::Result{std::string(10, 'x'), ""}),
       std::make_shared<FixedCollector>("over.txt", DiagnosticCollector::Result{std::string(11, 'x'), ""})};
@@ -208,7 +208,7 @@ TEST_F(DiagnosticsStoreTest, EvidenceIsTextAlsoWhereItIsCut) {
   EXPECT_EQ(items.readFile(DiagnosticKind::kWhirlcap, name, "b.txt"), "nine nine");
 }
 
-TEST_F(DiagnosticsStoreTest, NamesACollectorThatHangsAndDoesNotAskItAgainMeanwhile) {
+TEST_F(DiagnosticsStoreTest, NamesACollectorThatHangsAndDoesNotCallItAgainMeanwhile) {
   collectors = {held, std::make_shared<FixedCollector>("c.txt", DiagnosticCollector::Result{"whole", ""})};
   DiagnosticsStore::Limits limits;
   limits.collectors.time = 50ms;
@@ -251,7 +251,7 @@ TEST_F(DiagnosticsStoreTest, RefusesANameThatIsTaken) {
   EXPECT_TRUE(request(DiagnosticKind::kCapture, "one").boolean("first"));
 }
 
-TEST_F(DiagnosticsStoreTest, RefusesWhatDoesNotFitIntoItsQueueAndSaysSoOnce) {
+TEST_F(DiagnosticsStoreTest, RefusesItemsBeyondTheQueuesLimitAndLogsItOnce) {
   collectors = {held};
   DiagnosticsStore::Limits limits;
   limits.pendingItems = 2;
@@ -270,7 +270,7 @@ TEST_F(DiagnosticsStoreTest, RefusesWhatDoesNotFitIntoItsQueueAndSaysSoOnce) {
   EXPECT_THAT(lines.textsAt(LogLevel::kError), Contains("diagnostics are taken again; refused meanwhile: 2"));
 }
 
-TEST_F(DiagnosticsStoreTest, BoundsTheBytesThatWaitButTakesOneLargeItem) {
+TEST_F(DiagnosticsStoreTest, LimitsTheBytesOfPendingItemsButAcceptsOneLargeItem) {
   collectors = {held};
   DiagnosticsStore::Limits limits;
   limits.pendingBytes = 1000;
@@ -282,7 +282,7 @@ TEST_F(DiagnosticsStoreTest, BoundsTheBytesThatWaitButTakesOneLargeItem) {
   EXPECT_EQ(add({DiagnosticKind::kWhirlcap, "", large}), std::errc::no_buffer_space);
 }
 
-TEST_F(DiagnosticsStoreTest, KeepsAPayloadThatJsonCannotSay) {
+TEST_F(DiagnosticsStoreTest, KeepsAPayloadThatJsonCannotExpress) {
   start();
   const std::string name =
       addAndTake(
@@ -292,7 +292,7 @@ TEST_F(DiagnosticsStoreTest, KeepsAPayloadThatJsonCannotSay) {
               HasSubstr(R"("bad":null,"good":1)"));
 }
 
-TEST_F(DiagnosticsStoreTest, WritesWhatIsPendingAtTheEndWithoutEvidence) {
+TEST_F(DiagnosticsStoreTest, WritesPendingItemsAtTheEndWithoutEvidence) {
   collectors = {held};
   start();
   EXPECT_FALSE(add({DiagnosticKind::kCapture, "one"}));
@@ -353,7 +353,7 @@ class DiagnosticsBoundsTest : public DiagnosticsStoreTest {
   std::shared_ptr<SizedCollector> sized = std::make_shared<SizedCollector>(300 * kKibibyte);
 };
 
-TEST_F(DiagnosticsBoundsTest, TheOldestGoesWhateverItsKindWhenThereAreTooManyBytes) {
+TEST_F(DiagnosticsBoundsTest, RemovesTheOldestItemOfAnyKindWhenThereAreTooManyBytes) {
   set("max_megabytes", 1);
   start();
   ASSERT_FALSE(write(DiagnosticKind::kCapture, "one"));
@@ -369,7 +369,7 @@ TEST_F(DiagnosticsBoundsTest, TheOldestGoesWhateverItsKindWhenThereAreTooManyByt
   EXPECT_LE(bytesOnDisk(), 1024 * kKibibyte);
 }
 
-TEST_F(DiagnosticsBoundsTest, TheOldestGoesWhenThereAreTooManyItems) {
+TEST_F(DiagnosticsBoundsTest, RemovesTheOldestItemWhenThereAreTooManyItems) {
   set("max_items", 2);
   sized->bytes = 1;
   start();
@@ -381,7 +381,7 @@ TEST_F(DiagnosticsBoundsTest, TheOldestGoesWhenThereAreTooManyItems) {
   EXPECT_THAT(names(DiagnosticKind::kWhirlcap), ElementsAre("two", "three"));
 }
 
-TEST_F(DiagnosticsBoundsTest, AnItemThatFillsTheBoundIsAllThatIsLeft) {
+TEST_F(DiagnosticsBoundsTest, AnItemOfTheLargestSizeReplacesAllOthers) {
   set("max_megabytes", 1);
   start();
   ASSERT_FALSE(write(DiagnosticKind::kWhirlcap, "one"));
@@ -391,7 +391,7 @@ TEST_F(DiagnosticsBoundsTest, AnItemThatFillsTheBoundIsAllThatIsLeft) {
   EXPECT_EQ(bytesOnDisk(), 1024 * kKibibyte);
 }
 
-TEST_F(DiagnosticsBoundsTest, AnItemLargerThanTheBoundIsRefusedAndCostsNoOther) {
+TEST_F(DiagnosticsBoundsTest, AnItemBeyondTheLimitIsRefusedAndRemovesNoOther) {
   set("max_megabytes", 1);
   start();
   ASSERT_FALSE(write(DiagnosticKind::kWhirlcap, "one"));
@@ -403,7 +403,7 @@ TEST_F(DiagnosticsBoundsTest, AnItemLargerThanTheBoundIsRefusedAndCostsNoOther) 
       ElementsAre("cannot write " + items.pathOf(DiagnosticKind::kWhirlcap, "two") + ": File too large"));
 }
 
-TEST_F(DiagnosticsBoundsTest, WithoutPreferencesTheBoundIsAQuarterOfAGigabyte) {
+TEST_F(DiagnosticsBoundsTest, WithoutPreferencesTheLimitIsAQuarterOfAGigabyte) {
   sized->bytes = 1;
   start();
   ASSERT_FALSE(write(DiagnosticKind::kWhirlcap, "one"));
@@ -419,7 +419,7 @@ TEST_F(DiagnosticsBoundsTest, WithoutPreferencesTheBoundIsAQuarterOfAGigabyte) {
   EXPECT_THAT(names(DiagnosticKind::kWhirlcap), ElementsAre("three"));
 }
 
-TEST_F(DiagnosticsBoundsTest, BoundsThatAreNoNumbersFromOneAreLeftOutAndNamedOnce) {
+TEST_F(DiagnosticsBoundsTest, InvalidLimitsAreIgnoredAndLoggedOnce) {
   set("max_megabytes", "many");
   set("max_items", 0);
   start();
@@ -432,7 +432,7 @@ TEST_F(DiagnosticsBoundsTest, BoundsThatAreNoNumbersFromOneAreLeftOutAndNamedOnc
                   "max_megabytes = many max_items = 0"));
 }
 
-TEST_F(DiagnosticsBoundsTest, AFullDiskLeavesNoHalfItemsAndTheNextWorks) {
+TEST_F(DiagnosticsBoundsTest, AFullDiskLeavesNoIncompleteItemsAndTheNextItemWorks) {
   const SmallFileSystem disk(directory.path());  // of one megabyte
   if (!disk.isMounted()) GTEST_SKIP() << "only root can make a file system";
   start();
@@ -457,7 +457,7 @@ TEST_F(DiagnosticsBoundsTest, ADirectoryThatCannotBeMadeIsAnErrorUntilItCan) {
   EXPECT_FALSE(write(DiagnosticKind::kCapture, "two"));
 }
 
-TEST_F(DiagnosticsBoundsTest, RemovesWhatACrashLeftWhenToldTo) {
+TEST_F(DiagnosticsBoundsTest, RemovesLeftoversOfACrashOnRequest) {
   std::filesystem::create_directories(directory.path("captures/.one.new"));
   std::ofstream(directory.path("captures/.one.new/request.json")) << "{";
   start();

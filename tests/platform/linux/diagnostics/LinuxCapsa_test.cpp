@@ -131,7 +131,7 @@ TEST_F(LinuxCapsaTest, AnImmediateCaptureLeavesAFolderUnderItsSessionIdentifier)
             json::parse(R"({"kFaultsignKeyPayloadDEParameters": {"processIDs": [4711]}})"));
 }
 
-TEST_F(LinuxCapsaTest, WhatARequestDoesNotSayIsNotInItsFile) {
+TEST_F(LinuxCapsaTest, MissingValuesOfARequestAreNotInItsFile) {
   const Answer answer = snapshot({"a", "b", "c", "d", std::nullopt, ValueMap{{"level", 1}}});
   end();
   const json request = requestIn(answer.identifier());
@@ -139,7 +139,7 @@ TEST_F(LinuxCapsaTest, WhatARequestDoesNotSayIsNotInItsFile) {
   EXPECT_FALSE(request.contains("payload"));
 }
 
-TEST_F(LinuxCapsaTest, ACaptureWithADurationIsMadeWhenThatHasPassed) {
+TEST_F(LinuxCapsaTest, ACaptureWithADurationIsMadeAfterIt) {
   const Answer answer = start(signatureOf("alarms"), 60.0);
   EXPECT_TRUE(answer.isAccepted);
   ASSERT_THAT(answer.replies, SizeIs(1));
@@ -150,7 +150,7 @@ TEST_F(LinuxCapsaTest, ACaptureWithADurationIsMadeWhenThatHasPassed) {
   EXPECT_THAT(log.textsOf("twrs"), Not(Contains(HasSubstr("dropped"))));
 }
 
-TEST_F(LinuxCapsaTest, OneThatWasCancelledBeforeIsNotMade) {
+TEST_F(LinuxCapsaTest, ACancelledCaptureIsNotMade) {
   const Answer answer = start(signatureOf("alarms"), 60.0);
   reporter->cancelSession(answer.identifier());
   clock.advance(60.0);
@@ -196,7 +196,7 @@ TEST_F(LinuxCapsaTest, InvalidParametersAreNotAcceptedAndAnsweredWithTheirReason
   EXPECT_FALSE(answer.replies[0].contains(kFaultsignReplySessionID));
 }
 
-TEST_F(LinuxCapsaTest, TheSameAgainTooSoonIsThrottled) {
+TEST_F(LinuxCapsaTest, TheSameSignatureIsThrottled) {
   snapshot(signatureOf("haptics"));
   const Answer answer = snapshot(signatureOf("haptics"));
   EXPECT_TRUE(answer.isAccepted);
@@ -224,7 +224,7 @@ TEST_F(LinuxCapsaTest, TheDaysCapturesAreCountedAcrossRestarts) {
             Value(ValueMap{{"day", "2025-11-21"}, {"count", 1}}));
 }
 
-TEST_F(LinuxCapsaTest, ACountThatSomebodySpoiltIsNone) {
+TEST_F(LinuxCapsaTest, AnInvalidCountIsIgnored) {
   for (const Value& spoilt : {Value("many"), Value(ValueMap{{"day", "2025-11-20"}}),
                               Value(ValueMap{{"day", "2025-11-20"}, {"count", -7}})}) {
     ASSERT_FALSE(preferences->write("com.orvane.tonewerk.captures", "accepted", spoilt));
@@ -283,7 +283,7 @@ TEST_F(LinuxCapsaTest, ARequestWithoutAReplyHandlerIsServed) {
   EXPECT_THAT(folders(), SizeIs(1));
 }
 
-TEST_F(LinuxCapsaTest, ThreadsThatAskTogetherGetTheDaysCapturesAndNoMore) {
+TEST_F(LinuxCapsaTest, ConcurrentRequestsDoNotExceedTheDailyLimit) {
   std::atomic<int> started = 0;
   const auto ask = [&](const std::string& name) {
     const auto own = capsa->makeReporter();

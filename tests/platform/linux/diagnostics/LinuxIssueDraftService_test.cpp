@@ -157,7 +157,7 @@ TEST_F(DiagnosticServicesTest, SaysWhichStallTraceWasNotTaken) {
                           "Operation canceled"));
 }
 
-TEST_F(DiagnosticServicesTest, AFloodOfStallTracesIsBoundedAndNotALineEach) {
+TEST_F(DiagnosticServicesTest, TooManyStallTracesAreLimitedAndLoggedOnce) {
   preferences.configure(DiagnosticsStore::kPreferenceDomain, "max_items", 5);
   for (int count = 0; count < 2000; ++count) whirlcaps.request("r", "s", "", {}, {true, true});
   store.finish(30s);

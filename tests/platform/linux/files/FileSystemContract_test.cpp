@@ -104,7 +104,7 @@ TYPED_TEST(FileSystemContract, APlacedFileOutlivesItsWriter) {
   EXPECT_EQ(this->kind_.contents(this->path("d/name")), "text");
 }
 
-TYPED_TEST(FileSystemContract, ATakenNameIsRefusedAndWhatStandsThereStays) {
+TYPED_TEST(FileSystemContract, ATakenNameIsRefusedAndTheFileThereStays) {
   this->add("name", "old");
   EXPECT_EQ(this->create("name"), nullptr);
   EXPECT_EQ(this->error_, std::errc::file_exists);
@@ -186,7 +186,7 @@ TYPED_TEST(FileSystemContract, AFileInTheWayOfADirectoryIsAnError) {
             std::errc::not_a_directory);
 }
 
-TYPED_TEST(FileSystemContract, KnowsWhatStandsWhere) {
+TYPED_TEST(FileSystemContract, KnowsWhichPathsExist) {
   EXPECT_TRUE(this->kind_.files.exists(this->path("d")));
   EXPECT_FALSE(this->kind_.files.exists(this->path("d/file")));
   this->add("file", "");
@@ -321,7 +321,7 @@ void beKilledWhileWriting(const std::string& directory) {
   ASSERT_TRUE(WIFSIGNALED(status));
 }
 
-TEST(LinuxFileSystemTest, WhatAKilledProcessWasWritingIsRemovedWithTheNextFile) {
+TEST(LinuxFileSystemTest, TheNextFileRemovesLeftoversOfAKilledProcess) {
   const TemporaryDirectory directory;
   beKilledWhileWriting(directory.path());
   beKilledWhileWriting(directory.path());
@@ -334,7 +334,7 @@ TEST(LinuxFileSystemTest, WhatAKilledProcessWasWritingIsRemovedWithTheNextFile) 
   EXPECT_THAT(namesIn(directory.path()), ElementsAre("a.json"));
 }
 
-TEST(LinuxFileSystemTest, WhatOthersAreWritingOrIsNoLeftoverStays) {
+TEST(LinuxFileSystemTest, FilesThatAreNoLeftoversStay) {
   const TemporaryDirectory directory;
   LinuxFileSystem other;
   std::error_code error;
@@ -398,7 +398,7 @@ TEST(MemoryFileSystemTest, FailsOnDemand) {
   EXPECT_EQ(error, std::errc::permission_denied);
 }
 
-TEST(LinuxFileSystemTest, AFileThatFindsNoRoomIsNotPlaced) {
+TEST(LinuxFileSystemTest, AFileIsNotPlacedOnAFullDisk) {
   const TemporaryDirectory directory;
   const SmallFileSystem small(directory.path());
   if (!small.isMounted()) GTEST_SKIP() << "only root can make a file system";
@@ -447,7 +447,7 @@ class LinuxFileSystemCallTest : public testing::Test {
 };
 
 // Once it made files without end where none can be locked.
-TEST_F(LinuxFileSystemCallTest, WritesWhereNoFileCanBeLockedAndLeavesLeftovers) {
+TEST_F(LinuxFileSystemCallTest, WritesWithoutLocksAndKeepsLeftovers) {
   std::ofstream(directory.path(".new-1")) << "left";
   for (const int failure : {ENOLCK, EOPNOTSUPP}) {
     calls = 0;
@@ -460,7 +460,7 @@ TEST_F(LinuxFileSystemCallTest, WritesWhereNoFileCanBeLockedAndLeavesLeftovers) 
   }
 }
 
-TEST_F(LinuxFileSystemCallTest, MakesAnotherFileForOneThatSomebodyLockedFirst) {
+TEST_F(LinuxFileSystemCallTest, MakesAnotherFileIfAnotherProcessLockedTheFirst) {
   FileDescriptor held;
   write(SYS_flock, [&](const seccomp_data&) {
     if (++calls == 1) held = lockOnlyFile();
@@ -472,7 +472,7 @@ TEST_F(LinuxFileSystemCallTest, MakesAnotherFileForOneThatSomebodyLockedFirst) {
   EXPECT_THAT(namesIn(directory.path()), ElementsAre("a.json"));
 }
 
-TEST_F(LinuxFileSystemCallTest, MakesAnotherFileForOneThatWasRemovedBeforeItWasLocked) {
+TEST_F(LinuxFileSystemCallTest, MakesAnotherFileIfTheFirstWasRemovedBeforeItWasLocked) {
   write(SYS_flock, [&](const seccomp_data&) {
     if (++calls == 1) std::filesystem::remove(directory.path(namesIn(directory.path()).at(0)));
     return 0;
@@ -482,7 +482,7 @@ TEST_F(LinuxFileSystemCallTest, MakesAnotherFileForOneThatWasRemovedBeforeItWasL
   EXPECT_THAT(namesIn(directory.path()), ElementsAre("a.json"));
 }
 
-TEST_F(LinuxFileSystemCallTest, GivesUpWhereSomebodyLocksEveryNewFile) {
+TEST_F(LinuxFileSystemCallTest, GivesUpIfEveryNewFileIsLockedByAnotherProcess) {
   write(SYS_flock, [&](const seccomp_data&) { return ++calls <= kMaxCalls ? EWOULDBLOCK : 0; });
   EXPECT_EQ(error, std::errc::resource_unavailable_try_again);
   EXPECT_LT(calls, kMaxCalls);
@@ -503,7 +503,7 @@ TEST_F(LinuxFileSystemCallTest, ALeftoverIsLockedUntilItIsRemoved) {
 }
 
 // Else a crash of the system may take the name away again, though the text is on the disk.
-TEST_F(LinuxFileSystemCallTest, AFileWhoseNameIsNotOnTheDiskIsAFailure) {
+TEST_F(LinuxFileSystemCallTest, AFailedSyncOfTheDirectoryIsAFailure) {
   write(SYS_fsync, [&](const seccomp_data& call) {
     const std::string file = "/proc/self/fd/" + std::to_string(call.args[0]);
     if (!std::filesystem::equivalent(file, directory.path())) return 0;
@@ -517,7 +517,7 @@ TEST_F(LinuxFileSystemCallTest, AFileWhoseNameIsNotOnTheDiskIsAFailure) {
 }
 
 // Some file systems rename only over what stands there.
-TEST_F(LinuxFileSystemCallTest, AFileIsPlacedWithALinkWhereARenameWouldReplace) {
+TEST_F(LinuxFileSystemCallTest, AFileIsPlacedWithALinkIfARenameWouldReplace) {
   write(SYS_renameat2, [&](const seccomp_data&) {
     ++calls;
     return EINVAL;

@@ -35,7 +35,7 @@ TEST_F(RegularFileTest, ReadsTheSameWhateverIsExpected) {
   }
 }
 
-TEST_F(RegularFileTest, SaysThatThereIsMoreThanItMayRead) {
+TEST_F(RegularFileTest, FailsForAFileBeyondTheLimit) {
   std::ofstream(path_) << std::string(10'000, 'a');
   for (const std::size_t expected : std::initializer_list<std::size_t>{0, 9'999, 10'000}) {
     EXPECT_EQ(read(expected, 9'999), std::errc::file_too_large) << expected;

@@ -13,7 +13,7 @@ namespace tonewerk {
 namespace {
 
 // A pipe takes no more at once than fits into it.
-TEST(WriteAllTest, WritesWhatTheKernelTakesInPieces) {
+TEST(WriteAllTest, WritesAllTextInSeveralCalls) {
   int ends[2] = {-1, -1};
   ASSERT_EQ(pipe2(ends, O_CLOEXEC), 0);
   const FileDescriptor reading(ends[0]);

@@ -27,7 +27,7 @@ class WholeFileTest : public testing::Test {
   FileStamp stamp_{};
 };
 
-TEST_F(WholeFileTest, ReadsAFileUpToTheBoundAndNotPastIt) {
+TEST_F(WholeFileTest, ReadsAFileUpToTheLimit) {
   for (const std::size_t size : {std::size_t{0}, std::size_t{1}, kMax}) {
     write(std::string(size, 'a'));
     EXPECT_FALSE(read());
@@ -38,7 +38,7 @@ TEST_F(WholeFileTest, ReadsAFileUpToTheBoundAndNotPastIt) {
   EXPECT_EQ(read(), std::errc::file_too_large);
 }
 
-TEST_F(WholeFileTest, WaitsForNothingThatIsNoRegularFile) {
+TEST_F(WholeFileTest, DoesNotBlockOnOtherThanRegularFiles) {
   EXPECT_EQ(read(), std::errc::no_such_file_or_directory);
   ASSERT_EQ(mkfifo(path_.c_str(), 0600), 0);
   EXPECT_EQ(read(), std::errc::invalid_argument);
@@ -51,11 +51,11 @@ TEST_F(WholeFileTest, WaitsForNothingThatIsNoRegularFile) {
 }
 
 // The kernel's own files are never as large as they say: to a reader they grow under its hands.
-TEST_F(WholeFileTest, GivesUpOnAFileThatChangesWheneverItIsRead) {
+TEST_F(WholeFileTest, GivesUpOnAFileThatChangesAtEveryRead) {
   EXPECT_EQ(readWholeFile("/proc/self/stat", kMax, text_, stamp_), std::errc::resource_unavailable_try_again);
 }
 
-TEST_F(WholeFileTest, GivesTheOldOrTheNewOfAFileThatIsReplaced) {
+TEST_F(WholeFileTest, ReadsTheOldOrTheNewContentsOfAReplacedFile) {
   write(std::string(900, 'a'));
   std::atomic<bool> stop{false};
   std::thread publisher([&] {

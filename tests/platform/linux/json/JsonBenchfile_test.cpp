@@ -79,7 +79,7 @@ TEST_F(JsonBenchfileTest, WritesMoreThanItHoldsInMemory) {
   for (int i = 0; i < 10'000; ++i) ASSERT_EQ(benchmarks[static_cast<std::size_t>(i)].at("real_time"), i);
 }
 
-TEST_F(JsonBenchfileTest, ReplacesWhatAnEarlierRunLeft) {
+TEST_F(JsonBenchfileTest, ReplacesTheFileOfAnEarlierRun) {
   std::ofstream(directory_.path("data.bdj")) << std::string(100'000, 'x');
   EXPECT_FALSE(open()->close());
   EXPECT_TRUE(written().contains("context"));
@@ -103,7 +103,7 @@ TEST_F(JsonBenchfileTest, SaysWhyItCannotBeOpened) {
   EXPECT_EQ(systemError_, EEXIST);
 }
 
-TEST_F(JsonBenchfileTest, AWriterThatIsGivenUpLeavesNoFile) {
+TEST_F(JsonBenchfileTest, AnAbandonedWriterLeavesNoFile) {
   open()->newValue("decode", 1.5);
   EXPECT_FALSE(std::filesystem::exists(directory_.path("data.bdj")));
 }

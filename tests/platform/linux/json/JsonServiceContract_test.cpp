@@ -56,7 +56,7 @@ TYPED_TEST(JsonServiceContract, PrettyTextIsIndentedByTwoSpaces) {
   EXPECT_EQ(this->service_.pretty({}, this->problem_), "{}");
 }
 
-TYPED_TEST(JsonServiceContract, PrettyTextCannotSayWhatJsonLacks) {
+TYPED_TEST(JsonServiceContract, PrettyTextFailsForNumbersThatJsonLacks) {
   for (const double number : {kNaN, std::numeric_limits<double>::infinity()}) {
     this->problem_.clear();
     const ValueMap map{{"a", ValueMap{{"b", ValueArray{1, 2, number}}}}};
@@ -80,7 +80,7 @@ TYPED_TEST(JsonServiceContract, LargeIntegersKeepTheirValueAsLongAsTheyCan) {
   EXPECT_EQ(this->parse("18446744073709551616")->kind(), Value::Kind::kDouble);
 }
 
-TYPED_TEST(JsonServiceContract, WhatIsNoJsonOrNullIsRefused) {
+TYPED_TEST(JsonServiceContract, InvalidJsonAndNullAreRefused) {
   for (const char* text :
        {"", "{", "{\"a\":1,}", "nul", "null", "[1, null]", "1 2", "\"\xFF\"", "NaN", "1e999"}) {
     EXPECT_EQ(this->parse(text), std::nullopt) << text;
@@ -92,7 +92,7 @@ TYPED_TEST(JsonServiceContract, OfAKeyGivenTwiceTheLastWins) {
   EXPECT_EQ(this->parse(R"({"a": 1, "a": 2})"), Value(ValueMap{{"a", 2}}));
 }
 
-TEST(NlohmannJsonServiceTest, AProblemSaysWhere) {
+TEST(NlohmannJsonServiceTest, AProblemHasItsPosition) {
   const NlohmannJsonService service;
   std::string problem;
   EXPECT_FALSE(service.pretty({{"a", ValueMap{{"b", ValueArray{1, kNaN}}}}}, problem));
@@ -104,7 +104,7 @@ TEST(NlohmannJsonServiceTest, AProblemSaysWhere) {
   EXPECT_NE(problem.front(), '[');
 }
 
-TEST(NlohmannJsonServiceTest, NestingWithoutEndIsRefused) {
+TEST(NlohmannJsonServiceTest, DeepNestingIsRefused) {
   std::string problem;
   const std::string deep(100'000, '[');
   EXPECT_FALSE(NlohmannJsonService().parse(deep + std::string(deep.size(), ']'), problem));

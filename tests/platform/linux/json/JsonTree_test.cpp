@@ -104,7 +104,7 @@ TEST(JsonTreeTest, OfAFieldGivenTwiceTheLastCounts) {
   EXPECT_EQ(tree.field(tree.root(), "a")->unsignedInteger, 3U);
 }
 
-TEST(JsonTreeTest, SaysWhereATextIsNoJson) {
+TEST(JsonTreeTest, NamesThePositionOfASyntaxError) {
   JsonTree tree;
   std::string words;
   EXPECT_EQ(tree.parse("{\"a\":\n 1 2}", words), Failure::kNotJson);
@@ -120,7 +120,7 @@ TEST(JsonTreeTest, RefusesNumbersThatNoDoubleCanHold) {
   EXPECT_EQ(tree.parse("[1e999]", words), Failure::kNumberOutOfRange);
 }
 
-TEST(JsonTreeTest, NestingTakesNoStack) {
+TEST(JsonTreeTest, NestingUsesNoStack) {
   constexpr std::size_t kDepth = 100'000;
   JsonTree tree;
   std::string words;
@@ -129,7 +129,7 @@ TEST(JsonTreeTest, NestingTakesNoStack) {
   EXPECT_EQ(tree.root().count, 1U);
 }
 
-TEST(JsonTreeTest, ParsingAgainForgetsWhatWasThere) {
+TEST(JsonTreeTest, ParsingAgainReplacesTheTree) {
   JsonTree tree;
   std::string words;
   ASSERT_EQ(tree.parse(R"({"a": 1})", words), Failure::kNone);

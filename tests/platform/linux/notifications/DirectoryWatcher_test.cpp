@@ -121,7 +121,7 @@ class WatchedDirectoryTest : public DirectoryWatcherTest {
   }
 };
 
-TEST_F(WatchedDirectoryTest, AFileThatIsRewrittenIsTold) {
+TEST_F(WatchedDirectoryTest, AFileThatIsRewrittenIsReported) {
   write(path("a"));
   EXPECT_TRUE(waitFor("a"));
   toldSoFar();
@@ -129,14 +129,14 @@ TEST_F(WatchedDirectoryTest, AFileThatIsRewrittenIsTold) {
   EXPECT_TRUE(waitFor("a"));
 }
 
-TEST_F(WatchedDirectoryTest, AFileThatIsOpenedForWritingAndClosedIsTold) {
+TEST_F(WatchedDirectoryTest, AFileThatIsOpenedForWritingAndClosedIsReported) {
   write(path("a"));
   toldSoFar();
   std::ofstream(path("a"), std::ios::app).close();
   EXPECT_TRUE(waitFor("a"));
 }
 
-TEST_F(WatchedDirectoryTest, AFileThatIsRenamedIntoPlaceIsTold) {
+TEST_F(WatchedDirectoryTest, AFileThatIsRenamedIntoPlaceIsReported) {
   write(root.path("made"));
   fs::rename(root.path("made"), path("a"));
   EXPECT_TRUE(waitFor("a"));
@@ -146,13 +146,13 @@ TEST_F(WatchedDirectoryTest, AFileThatIsRenamedIntoPlaceIsTold) {
   EXPECT_TRUE(waitFor("a"));
 }
 
-TEST_F(WatchedDirectoryTest, AFileThatIsLinkedIntoPlaceIsTold) {
+TEST_F(WatchedDirectoryTest, AFileThatIsLinkedIntoPlaceIsReported) {
   write(root.path("made"));
   fs::create_hard_link(root.path("made"), path("a"));
   EXPECT_TRUE(waitFor("a"));
 }
 
-TEST_F(WatchedDirectoryTest, AFileThatIsMerelyCreatedIsNotTold) {
+TEST_F(WatchedDirectoryTest, AFileThatIsOnlyCreatedIsNotReported) {
   std::ofstream file(path("a"));
   ASSERT_TRUE(file.is_open());
   EXPECT_THAT(toldSoFar(), IsEmpty());
@@ -161,14 +161,14 @@ TEST_F(WatchedDirectoryTest, AFileThatIsMerelyCreatedIsNotTold) {
 }
 
 // Once told of twice, when its creation was read only after it had been written to.
-TEST_F(WatchedDirectoryTest, AFileThatIsCreatedAndWrittenInOneGoIsToldOnce) {
+TEST_F(WatchedDirectoryTest, AFileThatIsCreatedAndWrittenAtOnceIsReportedOnce) {
   hold();
   write(path("a"));
   release();
   EXPECT_THAT(toldSoFar(), ElementsAre("a"));
 }
 
-TEST_F(WatchedDirectoryTest, AFileThatIsCreatedAndWrittenToIsNotToldBeforeItIsClosed) {
+TEST_F(WatchedDirectoryTest, ANewFileIsNotReportedBeforeItsWriterClosesIt) {
   hold();
   std::ofstream file(path("a"));
   file << "1\n" << std::flush;
@@ -180,7 +180,7 @@ TEST_F(WatchedDirectoryTest, AFileThatIsCreatedAndWrittenToIsNotToldBeforeItIsCl
   EXPECT_THAT(toldSoFar(), IsEmpty());
 }
 
-TEST_F(WatchedDirectoryTest, AFileThatSomebodyReadsWhileItIsMadeIsToldOnce) {
+TEST_F(WatchedDirectoryTest, AFileThatIsReadWhileItIsWrittenIsReportedOnce) {
   const auto read = [this] { std::ifstream(path("a")).get(); };
   hold();
   {
@@ -194,7 +194,7 @@ TEST_F(WatchedDirectoryTest, AFileThatSomebodyReadsWhileItIsMadeIsToldOnce) {
   EXPECT_THAT(toldSoFar(), ElementsAre("a"));
 }
 
-TEST_F(WatchedDirectoryTest, EachWritingOfANewFileIsTold) {
+TEST_F(WatchedDirectoryTest, EachWriteToANewFileIsReported) {
   hold();
   write(path("a"));
   write(path("b"));
@@ -203,7 +203,7 @@ TEST_F(WatchedDirectoryTest, EachWritingOfANewFileIsTold) {
   EXPECT_THAT(toldSoFar(), ElementsAre("a", "b", "a"));
 }
 
-TEST_F(WatchedDirectoryTest, ALinkIsToldOnceHoweverLateItsComingIsRead) {
+TEST_F(WatchedDirectoryTest, ALinkIsReportedOnceHoweverLateItsEventIsRead) {
   write(root.path("made"));
   hold();
   fs::create_hard_link(root.path("made"), path("a"));
@@ -213,7 +213,7 @@ TEST_F(WatchedDirectoryTest, ALinkIsToldOnceHoweverLateItsComingIsRead) {
   EXPECT_THAT(toldSoFar(), IsEmpty());
 }
 
-TEST_F(WatchedDirectoryTest, ALinkThatSomebodyReadsIsToldOnce) {
+TEST_F(WatchedDirectoryTest, ALinkThatIsReadIsReportedOnce) {
   write(root.path("made"));
   hold();
   fs::create_hard_link(root.path("made"), path("a"));
@@ -224,7 +224,7 @@ TEST_F(WatchedDirectoryTest, ALinkThatSomebodyReadsIsToldOnce) {
   EXPECT_THAT(toldSoFar(), IsEmpty());
 }
 
-TEST_F(WatchedDirectoryTest, ALinkThatSomebodyHasOpenToReadIsToldWhenItIsClosed) {
+TEST_F(WatchedDirectoryTest, ALinkThatIsOpenForReadingIsReportedWhenItIsClosed) {
   write(root.path("made"));
   hold();
   fs::create_hard_link(root.path("made"), path("a"));
@@ -236,7 +236,7 @@ TEST_F(WatchedDirectoryTest, ALinkThatSomebodyHasOpenToReadIsToldWhenItIsClosed)
   EXPECT_TRUE(waitFor("a"));
 }
 
-TEST_F(WatchedDirectoryTest, ALinkThatIsWrittenToIsToldOnceWhenThatIsOver) {
+TEST_F(WatchedDirectoryTest, ALinkThatIsWrittenToIsReportedOnceAfterTheWrite) {
   write(root.path("made"));
   hold();
   fs::create_hard_link(root.path("made"), path("a"));
@@ -248,7 +248,7 @@ TEST_F(WatchedDirectoryTest, ALinkThatIsWrittenToIsToldOnceWhenThatIsOver) {
   EXPECT_THAT(toldSoFar(), ElementsAre("a"));
 }
 
-TEST_F(WatchedDirectoryTest, WhatIsGoneWhenItsComingIsReadIsNotTold) {
+TEST_F(WatchedDirectoryTest, AFileThatIsGoneWhenItsEventIsReadIsNotReported) {
   write(root.path("made"));
   hold();
   fs::create_hard_link(root.path("made"), path("a"));
@@ -257,7 +257,7 @@ TEST_F(WatchedDirectoryTest, WhatIsGoneWhenItsComingIsReadIsNotTold) {
   EXPECT_THAT(toldSoFar(), IsEmpty());
 }
 
-TEST_F(WatchedDirectoryTest, ReadingRemovingAndMovingAwayAreNotTold) {
+TEST_F(WatchedDirectoryTest, ReadingRemovingAndMovingAwayAreNotReported) {
   write(path("a"));
   write(path("b"));
   toldSoFar();
@@ -269,7 +269,7 @@ TEST_F(WatchedDirectoryTest, ReadingRemovingAndMovingAwayAreNotTold) {
   EXPECT_THAT(toldSoFar(), IsEmpty());
 }
 
-TEST_F(WatchedDirectoryTest, AFileThatWasRemovedIsToldWhenItIsThereAgain) {
+TEST_F(WatchedDirectoryTest, ARemovedFileIsReportedWhenItIsCreatedAgain) {
   write(path("a"));
   EXPECT_TRUE(waitFor("a"));
   toldSoFar();
@@ -278,7 +278,7 @@ TEST_F(WatchedDirectoryTest, AFileThatWasRemovedIsToldWhenItIsThereAgain) {
   EXPECT_TRUE(waitFor("a"));
 }
 
-TEST_F(WatchedDirectoryTest, WhatIsNoFileIsNotTold) {
+TEST_F(WatchedDirectoryTest, OnlyRegularFilesAreReported) {
   fs::create_directory(path("folder"));
   fs::create_directory(root.path("other"));
   fs::rename(root.path("other"), path("other"));
@@ -286,7 +286,7 @@ TEST_F(WatchedDirectoryTest, WhatIsNoFileIsNotTold) {
   EXPECT_THAT(toldSoFar(), IsEmpty());
 }
 
-TEST_F(WatchedDirectoryTest, WhatHappensBesideTheDirectoryIsNotTold) {
+TEST_F(WatchedDirectoryTest, ChangesOutsideTheDirectoryAreNotReported) {
   write(parent + "/reporting.sock");
   write(parent + "/watched2");
   fs::create_directory(parent + "/channels");
@@ -294,13 +294,13 @@ TEST_F(WatchedDirectoryTest, WhatHappensBesideTheDirectoryIsNotTold) {
 }
 
 // It is one event of the directory above, and queued every handler though nothing was posted.
-TEST_F(WatchedDirectoryTest, AChangedModeOfAWatchedDirectoryTellsNothing) {
+TEST_F(WatchedDirectoryTest, AChangedModeOfAWatchedDirectoryReportsNothing) {
   fs::permissions(watched, fs::perms::owner_all);
   fs::last_write_time(watched, fs::file_time_type::clock::now());
   EXPECT_THAT(toldSoFar(), IsEmpty());
 }
 
-TEST_F(WatchedDirectoryTest, ADirectoryThatIsRemovedAndMadeAgainIsFollowed) {
+TEST_F(WatchedDirectoryTest, ADirectoryThatIsRemovedAndCreatedAgainIsWatched) {
   for (int round = 0; round < 3; ++round) {
     fs::remove_all(watched);
     EXPECT_TRUE(waitFor(kEverything));
@@ -309,7 +309,7 @@ TEST_F(WatchedDirectoryTest, ADirectoryThatIsRemovedAndMadeAgainIsFollowed) {
   }
 }
 
-TEST_F(WatchedDirectoryTest, ADirectoryThatIsMovedAwayIsLetGoAndTheNewOneFollowed) {
+TEST_F(WatchedDirectoryTest, AfterADirectoryIsMovedAwayTheNewOneIsWatched) {
   fs::rename(watched, root.path("away"));
   EXPECT_TRUE(waitFor(kEverything));
   write(root.path("away/old"));
@@ -318,7 +318,7 @@ TEST_F(WatchedDirectoryTest, ADirectoryThatIsMovedAwayIsLetGoAndTheNewOneFollowe
   EXPECT_FALSE(wasEverTold("old"));
 }
 
-TEST_F(WatchedDirectoryTest, ADirectoryThatAnotherTakesThePlaceOfIsLetGo) {
+TEST_F(WatchedDirectoryTest, AReplacedDirectoryIsNoLongerWatched) {
   fs::create_directory(parent + "/next");
   write(parent + "/next/a");
   fs::rename(parent + "/next", watched);
@@ -326,14 +326,14 @@ TEST_F(WatchedDirectoryTest, ADirectoryThatAnotherTakesThePlaceOfIsLetGo) {
   EXPECT_TRUE(isFollowed());
 }
 
-TEST_F(WatchedDirectoryTest, AParentThatIsRemovedAndMadeAgainIsFound) {
+TEST_F(WatchedDirectoryTest, AParentThatIsRemovedAndCreatedAgainIsFound) {
   fs::remove_all(parent);
   EXPECT_TRUE(waitFor(kEverything));
   fs::create_directories(watched);
   EXPECT_TRUE(isFollowed());
 }
 
-TEST_F(WatchedDirectoryTest, AParentThatIsMovedAwayIsLetGo) {
+TEST_F(WatchedDirectoryTest, AParentThatIsMovedAwayIsNoLongerWatched) {
   fs::rename(parent, root.path("away"));
   EXPECT_TRUE(waitFor(kEverything));
   write(root.path("away/watched/old"));
@@ -342,7 +342,7 @@ TEST_F(WatchedDirectoryTest, AParentThatIsMovedAwayIsLetGo) {
   EXPECT_FALSE(wasEverTold("old"));
 }
 
-TEST_F(WatchedDirectoryTest, AnOverflowingEventQueueTellsEverything) {
+TEST_F(WatchedDirectoryTest, AnOverflowOfTheEventQueueReportsEverything) {
   std::size_t most = 0;
   std::ifstream("/proc/sys/fs/inotify/max_queued_events") >> most;
   if (most == 0 || most > 200'000) GTEST_SKIP() << "events that fit: " << most;
@@ -359,7 +359,7 @@ TEST_F(WatchedDirectoryTest, AnOverflowingEventQueueTellsEverything) {
   EXPECT_TRUE(waitFor("after"));
 }
 
-TEST_F(DirectoryWatcherTest, ADirectoryMayComeLater) {
+TEST_F(DirectoryWatcherTest, TheDirectoryMayBeCreatedLater) {
   fs::create_directories(parent);
   watch();
   EXPECT_TRUE(watcher->isWorking());
@@ -370,7 +370,7 @@ TEST_F(DirectoryWatcherTest, ADirectoryMayComeLater) {
   EXPECT_THAT(log.lines(), IsEmpty());
 }
 
-TEST_F(DirectoryWatcherTest, ADirectoryMayComeWithItsParent) {
+TEST_F(DirectoryWatcherTest, TheDirectoryMayBeCreatedWithItsParent) {
   watch();
   fs::create_directories(watched);
   EXPECT_TRUE(waitFor(kEverything));
@@ -378,7 +378,7 @@ TEST_F(DirectoryWatcherTest, ADirectoryMayComeWithItsParent) {
   EXPECT_TRUE(isFollowed());
 }
 
-TEST_F(DirectoryWatcherTest, ADirectoryMayComeLevelByLevelWithAPauseAtEach) {
+TEST_F(DirectoryWatcherTest, TheDirectoryMayBeCreatedLevelByLevelWithPauses) {
   watched = root.path("a/b/c/d");
   watch();
   for (const char* level : {"a", "a/b", "a/b/c"}) {
@@ -391,7 +391,7 @@ TEST_F(DirectoryWatcherTest, ADirectoryMayComeLevelByLevelWithAPauseAtEach) {
   EXPECT_THAT(log.lines(), IsEmpty());
 }
 
-TEST_F(DirectoryWatcherTest, AllDirectoriesAboveMayGoAndComeBack) {
+TEST_F(DirectoryWatcherTest, AllDirectoriesAboveMayBeRemovedAndCreatedAgain) {
   watched = root.path("a/b/c/d");
   fs::create_directories(watched);
   watch();
@@ -403,7 +403,7 @@ TEST_F(DirectoryWatcherTest, AllDirectoriesAboveMayGoAndComeBack) {
   }
 }
 
-TEST_F(DirectoryWatcherTest, AFileInTheDirectorysPlaceIsWaitedOut) {
+TEST_F(DirectoryWatcherTest, WaitsWhileAFileIsInTheDirectorysPlace) {
   fs::create_directories(parent);
   write(watched);
   watch();
@@ -412,7 +412,7 @@ TEST_F(DirectoryWatcherTest, AFileInTheDirectorysPlaceIsWaitedOut) {
   EXPECT_TRUE(isFollowed());
 }
 
-TEST_F(DirectoryWatcherTest, ADirectoryThatMayNotBeReadIsLoggedOnce) {
+TEST_F(DirectoryWatcherTest, AnUnreadableDirectoryIsLoggedOnce) {
   if (geteuid() == 0) GTEST_SKIP() << "root may read everything";
   fs::create_directories(watched);
   fs::permissions(watched, fs::perms::none);
@@ -422,7 +422,7 @@ TEST_F(DirectoryWatcherTest, ADirectoryThatMayNotBeReadIsLoggedOnce) {
   fs::permissions(watched, fs::perms::owner_all);
 }
 
-TEST_F(DirectoryWatcherTest, ADirectoryThatBecomesReadableIsFollowed) {
+TEST_F(DirectoryWatcherTest, ADirectoryThatBecomesReadableIsWatched) {
   if (geteuid() != 0) GTEST_SKIP() << "only root can watch as somebody else";
   constexpr auto kEverybodys = static_cast<fs::perms>(0755);
   fs::create_directories(watched);

@@ -96,7 +96,7 @@ TEST_F(InotifyNotificationServiceTest, ARemovedFilesStateIsZero) {
   EXPECT_EQ(service.state(token), 0U);
 }
 
-TEST_F(InotifyNotificationServiceTest, EveryNameIsToldWhenTheDirectoryIsReplaced) {
+TEST_F(InotifyNotificationServiceTest, EveryHandlerIsCalledWhenTheDirectoryIsReplaced) {
   const Token first = registerName(kName);
   const Token second = registerName("com.orvane.test.other");
   fs::rename(notifications, directory.path("away"));
@@ -108,7 +108,7 @@ TEST_F(InotifyNotificationServiceTest, EveryNameIsToldWhenTheDirectoryIsReplaced
   EXPECT_EQ(service.state(first), 0U);
 }
 
-TEST_F(InotifyNotificationServiceTest, ManyFilesThatNobodyRegisteredForChangeNothing) {
+TEST_F(InotifyNotificationServiceTest, FilesWithoutARegistrationChangeNothing) {
   const Token token = registerName(kName);
   for (int at = 0; at < 200; ++at) std::ofstream(file("other-" + std::to_string(at))) << at;
   EXPECT_FALSE(service.post(kName));
@@ -117,7 +117,7 @@ TEST_F(InotifyNotificationServiceTest, ManyFilesThatNobodyRegisteredForChangeNot
   EXPECT_EQ(count(token), 1);
 }
 
-TEST(InotifyNotificationServiceWithoutDirectoryTest, WorksOnceThereIsADirectory) {
+TEST(InotifyNotificationServiceWithoutDirectoryTest, WorksAfterTheDirectoryIsCreated) {
   const TemporaryDirectory directory;
   std::ofstream(directory.path("runtime")) << "a file in the way";
   MemoryLog log;

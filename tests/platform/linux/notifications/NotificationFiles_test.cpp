@@ -52,7 +52,7 @@ TEST_F(NotificationFilesTest, AStateIsADecimalNumberWithSpacesAroundIt) {
   }
 }
 
-TEST_F(NotificationFilesTest, WhatIsNoNumberOrTooMuchHasNoState) {
+TEST_F(NotificationFilesTest, AFileThatIsNoNumberOrTooLongHasNoState) {
   for (const std::string& text :
        {std::string(), std::string("\n"), std::string("one"), std::string("-1"), std::string("+1"),
         std::string("0x1"), std::string("1.0"), std::string("1 2"), std::string("1\0", 2),
@@ -71,7 +71,7 @@ TEST_F(NotificationFilesTest, WithoutAFileThereIsNoState) {
   EXPECT_EQ(error, std::errc::no_such_file_or_directory);
 }
 
-TEST_F(NotificationFilesTest, APostMakesTheDirectoryAndLeavesNothingElseInIt) {
+TEST_F(NotificationFilesTest, APostCreatesTheDirectoryAndLeavesNoOtherFiles) {
   EXPECT_FALSE(files.post("a"));
   EXPECT_FALSE(files.post("b", 5));
   EXPECT_FALSE(files.post("a", std::numeric_limits<std::uint64_t>::max()));
@@ -114,7 +114,7 @@ TEST_F(NotificationFilesTest, ALinkDoesNotLeadOutOfTheDirectory) {
   EXPECT_EQ(outside, "41");
 }
 
-TEST_F(NotificationFilesTest, WhatIsNoRegularFileIsRefusedAtOnce) {
+TEST_F(NotificationFilesTest, OtherThanRegularFilesAreRefusedAtOnce) {
   std::filesystem::create_directories(files.directory() + "/folder");
   ASSERT_EQ(mkfifo((files.directory() + "/pipe").c_str(), 0600), 0);
   EXPECT_EQ(state("folder"), std::nullopt);
@@ -134,7 +134,7 @@ TEST_F(NotificationFilesTest, AFileInTheDirectorysPlaceIsAFailure) {
   EXPECT_EQ(state("b"), std::nullopt);
 }
 
-TEST_F(NotificationFilesTest, WhatRootPostsTheDirectorysOwnerCanPostAgain) {
+TEST_F(NotificationFilesTest, TheDirectorysOwnerCanPostANameAfterRoot) {
   if (geteuid() != 0) GTEST_SKIP() << "only root can be root";
   const std::string runtime = directory.path("a");
   std::filesystem::create_directory(runtime);

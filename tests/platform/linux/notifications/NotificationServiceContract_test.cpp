@@ -116,7 +116,7 @@ TYPED_TEST(NotificationServiceContract, APostRunsTheHandlerOnItsQueueWithItsToke
   EXPECT_TRUE(this->waitUntil([&] { return *told == registration.token && *onQueue; }));
 }
 
-TYPED_TEST(NotificationServiceContract, EachRegistrationOfANameIsTold) {
+TYPED_TEST(NotificationServiceContract, EachHandlerOfANameIsCalled) {
   const auto first = this->newCount();
   const auto second = this->newCount();
   EXPECT_NE(this->count(kName, first), this->count(kName, second));
@@ -133,7 +133,7 @@ TYPED_TEST(NotificationServiceContract, TheStateIsTheOneLastPosted) {
   }
 }
 
-TYPED_TEST(NotificationServiceContract, TheStateIsZeroBeforeAnybodyPosts) {
+TYPED_TEST(NotificationServiceContract, TheStateIsZeroBeforeTheFirstPost) {
   EXPECT_EQ(this->service().state(this->count(kName, this->newCount())), 0U);
 }
 
@@ -147,13 +147,13 @@ TYPED_TEST(NotificationServiceContract, APostKeepsTheState) {
   EXPECT_EQ(this->service().state(token), 41U);
 }
 
-TYPED_TEST(NotificationServiceContract, PostsOneAfterTheOtherAreEachTold) {
+TYPED_TEST(NotificationServiceContract, ConsecutivePostsEachCallTheHandler) {
   const auto told = this->newCount();
   this->count(kName, told);
   for (int post = 0; post < 5; ++post) this->postAndWait(kName, told);
 }
 
-TYPED_TEST(NotificationServiceContract, AHandlerSeesTheStateOfThePostItIsToldOf) {
+TYPED_TEST(NotificationServiceContract, AHandlerSeesTheStateOfItsPost) {
   const auto seen = std::make_shared<std::optional<std::uint64_t>>();
   const auto registration = this->service().registerHandler(kName, this->queue_, [this, seen](Token token) {
     this->change([&] { *seen = this->service().state(token); });
@@ -163,7 +163,7 @@ TYPED_TEST(NotificationServiceContract, AHandlerSeesTheStateOfThePostItIsToldOf)
   EXPECT_TRUE(this->waitUntil([&] { return *seen == std::optional<std::uint64_t>(7); }));
 }
 
-TYPED_TEST(NotificationServiceContract, OtherNamesAreNotTold) {
+TYPED_TEST(NotificationServiceContract, HandlersOfOtherNamesAreNotCalled) {
   const auto told = this->newCount();
   const auto others = this->newCount();
   this->count(kName, told);
@@ -174,7 +174,7 @@ TYPED_TEST(NotificationServiceContract, OtherNamesAreNotTold) {
   EXPECT_EQ(this->valueOf(told), 0);
 }
 
-TYPED_TEST(NotificationServiceContract, WhatIsCancelledIsNotToldAndHasNoState) {
+TYPED_TEST(NotificationServiceContract, ACancelledHandlerIsNotCalledAndHasNoState) {
   const auto told = this->newCount();
   const auto witness = this->newCount();
   const Token token = this->count(kName, told);
@@ -200,7 +200,7 @@ TYPED_TEST(NotificationServiceContract, AHandlerMayCancelItsOwnToken) {
   EXPECT_EQ(this->valueOf(told), 1);
 }
 
-TYPED_TEST(NotificationServiceContract, AHandlerThatIsQueuedAlreadyDoesNotBeginOnceItIsCancelled) {
+TYPED_TEST(NotificationServiceContract, AQueuedHandlerDoesNotRunAfterItIsCancelled) {
   const auto told = this->newCount();
   const auto witness = this->newCount();
   const Token token = this->count(kName, told);
@@ -231,7 +231,7 @@ TYPED_TEST(NotificationServiceContract, AHandlerMayRegisterAndPost) {
   EXPECT_TRUE(this->waitUntil([&] { return *told > 0; }));
 }
 
-TYPED_TEST(NotificationServiceContract, APostDuringTheHandlerIsToldAgain) {
+TYPED_TEST(NotificationServiceContract, APostDuringTheHandlerCallsItAgain) {
   const auto told = this->newCount();
   const auto registration = this->service().registerHandler(kName, this->queue_, [this, told](Token) {
     if (this->valueOf(told) == 0) {
@@ -244,7 +244,7 @@ TYPED_TEST(NotificationServiceContract, APostDuringTheHandlerIsToldAgain) {
   EXPECT_TRUE(this->waitUntil([&] { return *told >= 2; }));
 }
 
-TYPED_TEST(NotificationServiceContract, WhatIsNoFileNameIsRefused) {
+TYPED_TEST(NotificationServiceContract, NamesThatAreNotFileNamesAreRefused) {
   for (const std::string& name : {std::string(), std::string("."), std::string(".."), std::string("a/b"),
                                   std::string("../x"), std::string("a\0b", 3), std::string(256, 'a')}) {
     const auto registration = this->service().registerHandler(name, this->queue_, [](Token) {});
@@ -269,7 +269,7 @@ TYPED_TEST(NotificationServiceContract, AnUnknownTokenHasNoState) {
   EXPECT_EQ(this->service().state(12345), std::nullopt);
 }
 
-TYPED_TEST(NotificationServiceContract, CountlessPostsWaitAsOnePieceOfWork) {
+TYPED_TEST(NotificationServiceContract, ManyPostsWaitAsOnePieceOfWork) {
   std::promise<void> release;
   this->queue_.async([released = release.get_future().share()] { released.wait(); });
   const auto told = this->newCount();

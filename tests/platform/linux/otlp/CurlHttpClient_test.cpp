@@ -55,7 +55,7 @@ TEST_F(CurlHttpClientTest, SendsALargeBodyWithoutAskingFirst) {
   EXPECT_EQ(receiver_.requests().at(0).body.size(), large.size());
 }
 
-TEST_F(CurlHttpClientTest, ForgetsTheAnswerBefore) {
+TEST_F(CurlHttpClientTest, ForgetsThePreviousAnswer) {
   postAndGet({.status = 503, .headers = {"Retry-After: 17"}, .body = "busy"});
   const HttpAnswer answer = postAndGet({});
   EXPECT_EQ(answer.status, 200);
@@ -70,20 +70,20 @@ TEST_F(CurlHttpClientTest, NeverFollowsARedirection) {
   EXPECT_THAT(receiver_.requests(), SizeIs(1));
 }
 
-TEST_F(CurlHttpClientTest, ReadsNoMoreOfABodyThanItsBound) {
+TEST_F(CurlHttpClientTest, ReadsABodyUpToItsLimit) {
   const HttpAnswer answer = postAndGet({.fault = Fault::kHugeBody});
   EXPECT_EQ(answer.status, 200);
   EXPECT_EQ(answer.body.size(), HttpAnswer::kMaxBodyBytes);
   EXPECT_THAT(answer.problem, Not(IsEmpty()));
 }
 
-TEST_F(CurlHttpClientTest, ReadsNoMoreOfTheHeadersThanTheirBound) {
+TEST_F(CurlHttpClientTest, ReadsHeadersUpToTheirLimit) {
   const HttpAnswer answer = postAndGet({.fault = Fault::kHugeHeader});
   EXPECT_EQ(answer.body, "");
   EXPECT_THAT(answer.problem, Not(IsEmpty()));
 }
 
-TEST_F(CurlHttpClientTest, GarbageAndAnEarlyEndAreNoAnswer) {
+TEST_F(CurlHttpClientTest, InvalidAndIncompleteAnswersAreNoAnswer) {
   for (const Fault fault : {Fault::kGarbage, Fault::kCloseEarly}) {
     const HttpAnswer answer = postAndGet({.fault = fault});
     EXPECT_EQ(answer.status, 0);
@@ -98,7 +98,7 @@ TEST_F(CurlHttpClientTest, SaysWhenTheBodyIsCut) {
   EXPECT_THAT(answer.problem, Not(IsEmpty()));
 }
 
-TEST_F(CurlHttpClientTest, NobodyListeningIsNoAnswer) {
+TEST_F(CurlHttpClientTest, AClosedPortGivesNoAnswer) {
   const HttpAnswer answer = client_.post({OtlpReceiver::deadAddress() + "/v1/logs", {}, ""});
   EXPECT_EQ(answer.status, 0);
   EXPECT_THAT(answer.problem, Not(IsEmpty()));
@@ -112,7 +112,7 @@ TEST_F(CurlHttpClientTest, GivesUpOnAnEndpointThatHangs) {
   EXPECT_THAT(answer.problem, Not(IsEmpty()));
 }
 
-TEST_F(CurlHttpClientTest, ACancelledPostReturnsAtOnceAndSoDoThoseAfterIt) {
+TEST_F(CurlHttpClientTest, ACancelledPostAndLaterOnesReturnAtOnce) {
   receiver_.answerNext({.fault = Fault::kHang});
   HttpAnswer answer;
   answer.status = -1;

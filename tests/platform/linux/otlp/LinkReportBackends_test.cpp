@@ -42,7 +42,7 @@ TEST(LinkReportBackendsTest, AnAddressIsTheBaseOfWhereLogsArePosted) {
   EXPECT_THAT(backends.problems, IsEmpty());
 }
 
-TEST(LinkReportBackendsTest, WhatDoesNotParseIsNoBackend) {
+TEST(LinkReportBackendsTest, InvalidEntriesAreLeftOut) {
   for (const char* entry :
        {"", "Local", "collector", "collector:4318", "http://", "ftp://collector", "file:///etc/passwd",
         "http://a b", "http://collector:99999", "http://collector?x=1", "http://collector#x"}) {
@@ -58,7 +58,7 @@ TEST(LinkReportBackendsTest, APasswordIsNeitherTakenNorShown) {
   EXPECT_THAT(backends.problems, ElementsAre(Not(HasSubstr("secret"))));
 }
 
-TEST(LinkReportBackendsTest, SaysWhatIsNoTextAndNoArray) {
+TEST(LinkReportBackendsTest, NamesValuesThatAreNoTextOrNoArray) {
   EXPECT_THAT(backendsOf({5, "local"}).problems, ElementsAre("an entry is no text: 5"));
   EXPECT_TRUE(backendsOf({5, "local"}).local);
   const LinkReportBackends backends = LinkReportBackends::from(Value("local"));

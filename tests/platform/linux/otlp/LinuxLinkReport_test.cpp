@@ -80,7 +80,7 @@ class LinuxLinkReportTest : public testing::Test {
   std::string problem_;
 };
 
-TEST_F(LinuxLinkReportTest, TokensDifferAndTellTheWayFromTheRoot) {
+TEST_F(LinuxLinkReportTest, TokensDifferAndBeginWithTheirParents) {
   const auto root = service_.newHierarchyTokenFromParentToken(std::nullopt);
   const auto other = service_.newHierarchyTokenFromParentToken(std::nullopt);
   ASSERT_TRUE(root && other);
@@ -148,7 +148,7 @@ TEST_F(LinuxLinkReportTest, SessionsShareAnEndpointsExporter) {
   EXPECT_THAT(receiver_.records(), SizeIs(2));
 }
 
-TEST_F(LinuxLinkReportTest, NamesTheDeviceOnlyWhereSomebodyOptedIn) {
+TEST_F(LinuxLinkReportTest, NamesTheDeviceOnlyAfterTheUserOptedIn) {
   configure("backends", ValueArray{receiver_.address()});
   const auto session = start(false);
   send(*session, {{"a", 1}});
@@ -172,7 +172,7 @@ TEST_F(LinuxLinkReportTest, RepeatsTheEventsNameWhereAskedTo) {
   EXPECT_THAT(receiver_.problems(), IsEmpty());
 }
 
-TEST_F(LinuxLinkReportTest, SaysOnceWhatItCannotReadAndTakesAChangeAtTheNextSession) {
+TEST_F(LinuxLinkReportTest, LogsAnInvalidPreferenceOnceAndUsesAChangeInTheNextSession) {
   configure("backends", ValueArray{"nonsense"});
   start();
   start();
@@ -190,7 +190,7 @@ TEST_F(LinuxLinkReportTest, RefusesAPayloadThatIsTooLarge) {
   EXPECT_EQ(count("rtc_message"), 0);
 }
 
-TEST_F(LinuxLinkReportTest, SendsToSoManyAddressesInOneRunAndNoMore) {
+TEST_F(LinuxLinkReportTest, LimitsTheNumberOfAddresses) {
   for (int n = 0; n < 20; ++n) {
     configure("backends", ValueArray{receiver_.address() + "/" + std::to_string(n)});
     start();

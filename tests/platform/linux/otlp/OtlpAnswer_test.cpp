@@ -25,7 +25,7 @@ TEST(OtlpAnswerTest, SaysHowManyRecordsWereRejectedAndWhy) {
   }
 }
 
-TEST(OtlpAnswerTest, IsNotReadOutOfAnythingElse) {
+TEST(OtlpAnswerTest, RefusesOtherJson) {
   for (const char* body :
        {"no", "[]", "3", R"({"partialSuccess":1})", R"({"partialSuccess":{"errorMessage":1}})",
         R"({"partialSuccess":{"rejectedLogRecords":"3x"}})",

@@ -81,7 +81,7 @@ TEST_F(OtlpExporterTest, SendsABatchWhenItsTimeHasCome) {
   EXPECT_TRUE(receiver_.waitForRequests(1));
 }
 
-TEST_F(OtlpExporterTest, AtTheEndSendsWhatWaits) {
+TEST_F(OtlpExporterTest, AtTheEndSendsWaitingRecords) {
   OtlpOutbox::Limits patient;
   patient.batchTime = hours(1);
   open(receiver_.address(), patient);
@@ -93,7 +93,7 @@ TEST_F(OtlpExporterTest, AtTheEndSendsWhatWaits) {
   EXPECT_THAT(errors(), IsEmpty());
 }
 
-TEST_F(OtlpExporterTest, AtTheEndTriesOnceMoreWhatFailedBefore) {
+TEST_F(OtlpExporterTest, AtTheEndTriesFailedRecordsOnceMore) {
   receiver_.answerNext({.fault = Fault::kCloseEarly});
   open(receiver_.address());
   add(1, Urgency::kAtOnce);
@@ -102,7 +102,7 @@ TEST_F(OtlpExporterTest, AtTheEndTriesOnceMoreWhatFailedBefore) {
   EXPECT_THAT(receiver_.requests(), SizeIs(2));
 }
 
-TEST_F(OtlpExporterTest, AnEndpointThatHangsHoldsUpNeitherWhoAddsNorTheEnd) {
+TEST_F(OtlpExporterTest, AnEndpointThatHangsBlocksNeitherAddNorTheEnd) {
   receiver_.answerNext({.fault = Fault::kHang});
   OtlpOutbox::Limits small;
   small.bytes = 100'000;
@@ -120,7 +120,7 @@ TEST_F(OtlpExporterTest, AnEndpointThatHangsHoldsUpNeitherWhoAddsNorTheEnd) {
   EXPECT_THAT(errors(), Contains(HasSubstr("dropped in all: " + std::to_string(10'000 - kept))));
 }
 
-TEST_F(OtlpExporterTest, ADeadEndpointLosesWhatItWasSent) {
+TEST_F(OtlpExporterTest, RecordsForADeadEndpointAreLost) {
   open(OtlpReceiver::deadAddress());
   add(1, Urgency::kAtOnce);
   EXPECT_TRUE(end());

@@ -43,7 +43,7 @@ class OtlpLogRecordTest : public testing::Test {
   OtlpLogRecord record_;
 };
 
-TEST_F(OtlpLogRecordTest, SaysWhenAndWhat) {
+TEST_F(OtlpLogRecordTest, HoldsTimeAndEventName) {
   const json found = encoded();
   EXPECT_EQ(found["timeUnixNano"], "1763633880500000000");
   EXPECT_EQ(found["observedTimeUnixNano"], "1763633880500000000");
@@ -53,7 +53,7 @@ TEST_F(OtlpLogRecordTest, SaysWhenAndWhat) {
   EXPECT_FALSE(found.contains("droppedAttributesCount"));
 }
 
-TEST_F(OtlpLogRecordTest, SaysOfWhichSessionAndKindItIs) {
+TEST_F(OtlpLogRecordTest, HoldsSessionCategoryAndType) {
   const auto found = attributes();
   EXPECT_EQ(found.at("session.id"), (json{{"stringValue", "-77"}}));
   EXPECT_EQ(found.at("tonewerk.category"), (json{{"intValue", "4"}}));
@@ -89,7 +89,7 @@ TEST_F(OtlpLogRecordTest, KeepsTheTypesOfThePayload) {
   EXPECT_THAT(problemsOfOtlpLogs(request({"n", "v", "h", "d"})), IsEmpty());
 }
 
-TEST_F(OtlpLogRecordTest, SaysNumbersThatJsonLacksInWords) {
+TEST_F(OtlpLogRecordTest, WritesNumbersThatJsonLacksAsTexts) {
   record_.payload = {{"nan", std::numeric_limits<double>::quiet_NaN()},
                      {"up", std::numeric_limits<double>::infinity()},
                      {"down", -std::numeric_limits<double>::infinity()}};
@@ -100,7 +100,7 @@ TEST_F(OtlpLogRecordTest, SaysNumbersThatJsonLacksInWords) {
   EXPECT_THAT(problemsOfOtlpLogs(request({"n", "v", "h", "d"})), IsEmpty());
 }
 
-TEST_F(OtlpLogRecordTest, APayloadCannotPassForOurAttributes) {
+TEST_F(OtlpLogRecordTest, APayloadCannotReplaceReservedAttributes) {
   record_.payload = {
       {"session.id", 1}, {"tonewerk.type", 2}, {"log.record.uid", 3}, {"event.name", 4}, {"", 5}, {"a", 6}};
   EXPECT_EQ(attributes().at("session.id"), (json{{"stringValue", "-77"}}));
@@ -114,14 +114,14 @@ TEST_F(OtlpLogRecordTest, RepeatsTheEventsNameForOldReceiversWhenAsked) {
   EXPECT_EQ(attributes().at("event.name"), (json{{"stringValue", "telephony_session"}}));
 }
 
-TEST_F(OtlpLogRecordTest, TimesThatAreNoTimesAreEncodedAllTheSame) {
+TEST_F(OtlpLogRecordTest, InvalidTimesAreEncoded) {
   for (const double time : {-1.0, 1e300, std::numeric_limits<double>::quiet_NaN()}) {
     record_.time = time;
     EXPECT_TRUE(encoded()["timeUnixNano"].is_string());
   }
 }
 
-TEST_F(OtlpLogRecordTest, ARequestSaysWhoReports) {
+TEST_F(OtlpLogRecordTest, ARequestNamesItsSender) {
   const std::string text = request({"com.orvane.tonewerk", "1.2.3", "abcdef", ""});
   EXPECT_THAT(problemsOfOtlpLogs(text), IsEmpty());
   const json resourceLogs = json::parse(text)["resourceLogs"];
@@ -136,7 +136,7 @@ TEST_F(OtlpLogRecordTest, ARequestSaysWhoReports) {
   EXPECT_EQ(scopeLogs[0]["logRecords"].size(), 2U);
 }
 
-TEST_F(OtlpLogRecordTest, ADeviceIsNamedWhereSomebodyOptedIn) {
+TEST_F(OtlpLogRecordTest, ADeviceIsNamedAfterTheUserOptedIn) {
   EXPECT_THAT(request({"n", "v", "h", "speaker-7"}), HasSubstr("\"device.id\""));
   EXPECT_THAT(request({"n", "v", "h", ""}), Not(HasSubstr("device.id")));
 }

@@ -24,13 +24,13 @@ class OtlpOutboxTest : public testing::Test {
   OtlpOutbox::Time now_ = seconds(100);
 };
 
-TEST_F(OtlpOutboxTest, AFreshOneHasNothing) {
+TEST_F(OtlpOutboxTest, ANewOutboxIsEmpty) {
   EXPECT_EQ(outbox_.nextDue(), std::nullopt);
   EXPECT_THAT(take(), IsEmpty());
   EXPECT_FALSE(outbox_.flush());
 }
 
-TEST_F(OtlpOutboxTest, BatchedRecordsWaitFiveSecondsForCompany) {
+TEST_F(OtlpOutboxTest, BatchedRecordsWaitFiveSeconds) {
   EXPECT_EQ(add("a"), Added::kChangedDue);
   now_ += seconds(4);
   EXPECT_EQ(add("b"), Added::kKept);
@@ -50,7 +50,7 @@ TEST_F(OtlpOutboxTest, FiveHundredAndTwelveAreDueAtOnce) {
   EXPECT_THAT(take(), IsEmpty());
 }
 
-TEST_F(OtlpOutboxTest, AFlushMakesWhatWaitsDueAndNotWhatComesLater) {
+TEST_F(OtlpOutboxTest, AFlushMakesWaitingRecordsDueAndNotLaterOnes) {
   for (int n = 0; n < 600; ++n) add("x");
   EXPECT_TRUE(outbox_.flush());
   EXPECT_THAT(take(), SizeIs(512));
@@ -61,7 +61,7 @@ TEST_F(OtlpOutboxTest, AFlushMakesWhatWaitsDueAndNotWhatComesLater) {
   EXPECT_THAT(take(), IsEmpty());
 }
 
-TEST_F(OtlpOutboxTest, RealTimeRecordsGoAtOnceAndLeaveTheBatchAlone) {
+TEST_F(OtlpOutboxTest, RealTimeRecordsAreDueAtOnceAndDoNotChangeTheBatch) {
   add("batched");
   EXPECT_EQ(add("now", Urgency::kAtOnce), Added::kChangedDue);
   EXPECT_LE(*outbox_.nextDue(), now_);
@@ -69,7 +69,7 @@ TEST_F(OtlpOutboxTest, RealTimeRecordsGoAtOnceAndLeaveTheBatchAlone) {
   EXPECT_EQ(outbox_.nextDue(), seconds(105));
 }
 
-TEST_F(OtlpOutboxTest, ABatchIsBoundedInBytes) {
+TEST_F(OtlpOutboxTest, ABatchHasALimitOfBytes) {
   const std::string megabyte(std::size_t{1} << 20, 'x');
   for (int n = 0; n < 6; ++n) add(megabyte, Urgency::kAtOnce);
   EXPECT_THAT(take(), SizeIs(3));
@@ -92,7 +92,7 @@ TEST_F(OtlpOutboxTest, KeepsEightMegabytesUntilTheyAreSettled) {
   EXPECT_EQ(outbox_.takeDropped(), 0U);
 }
 
-TEST_F(OtlpOutboxTest, ARecordLargerThanAllTheRoomIsDropped) {
+TEST_F(OtlpOutboxTest, ARecordLargerThanTheOutboxIsDropped) {
   EXPECT_EQ(add(std::string(std::size_t{9} << 20, 'x')), Added::kDropped);
 }
 

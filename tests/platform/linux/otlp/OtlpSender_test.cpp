@@ -81,7 +81,7 @@ class OtlpSenderTest : public testing::Test {
                      RetryPolicy([] { return 1.0; })};
 };
 
-TEST_F(OtlpSenderTest, SendsNothingWhenNothingWaits) {
+TEST_F(OtlpSenderTest, SendsNothingWithoutRecords) {
   EXPECT_EQ(send(), -1.0);
   EXPECT_THAT(client_.requests, IsEmpty());
 }
@@ -108,7 +108,7 @@ TEST_F(OtlpSenderTest, BatchedRecordsGoTogetherAfterFiveSeconds) {
   EXPECT_THAT(sent(), ElementsAre("\"a\",\"b\""));
 }
 
-TEST_F(OtlpSenderTest, AsksForTheResourceAnewForEveryRequest) {
+TEST_F(OtlpSenderTest, GetsTheResourceForEveryRequest) {
   add("a");
   send();
   resource_.deviceIdentifier = "speaker-7";
@@ -167,7 +167,7 @@ TEST_F(OtlpSenderTest, WaitsAsLongAsTheEndpointAsks) {
   EXPECT_EQ(send(), -1.0);
 }
 
-TEST_F(OtlpSenderTest, DropsAndCountsWhatIsRefusedAndSaysItOnce) {
+TEST_F(OtlpSenderTest, DropsAndCountsRefusedRecordsAndLogsItOnce) {
   client_.answers = {answerOf(400), answerOf(400), answerOf(307), answerOf(500)};
   for (const char* record : {"a", "b", "c", "d", "e"}) {
     add(record);
@@ -180,7 +180,7 @@ TEST_F(OtlpSenderTest, DropsAndCountsWhatIsRefusedAndSaysItOnce) {
   EXPECT_THAT(errors().back(), HasSubstr("dropped in all: 4"));
 }
 
-TEST_F(OtlpSenderTest, SendsHalvesOfWhatIsTooLarge) {
+TEST_F(OtlpSenderTest, SendsTooLargeBatchesInHalves) {
   client_.answers = {answerOf(413), answerOf(413), answerOf(200), answerOf(413)};
   for (const char* record : {"a", "b", "c", "d", "e"}) add(record);
   EXPECT_EQ(send(), -1.0);
@@ -194,7 +194,7 @@ TEST_F(OtlpSenderTest, SendsHalvesOfWhatIsTooLarge) {
   EXPECT_EQ(outbox_.takeDropped(), 0U);  // all the room came back
 }
 
-TEST_F(OtlpSenderTest, HalvesThatCannotGoNowAreKept) {
+TEST_F(OtlpSenderTest, HalvesThatCannotBeSentNowAreKept) {
   client_.answers = {answerOf(413), answerOf(503)};
   add("a");
   add("b");
@@ -220,7 +220,7 @@ TEST_F(OtlpSenderTest, LogsAPartialSuccessAndDoesNotTryAgain) {
   EXPECT_THAT(errors().back(), HasSubstr("dropped in all: 2"));
 }
 
-TEST_F(OtlpSenderTest, AnAnswerThatCannotBeReadIsSaidOnceAndTheRecordsAreDelivered) {
+TEST_F(OtlpSenderTest, AnInvalidAnswerIsLoggedOnceAndTheRecordsAreDelivered) {
   HttpAnswer cut = answerOf(200, "xxx");
   cut.problem = "too long";
   client_.answers = {answerOf(200, "<html>"), answerOf(200, "<html>"), cut, answerOf(200, "{}")};
@@ -233,7 +233,7 @@ TEST_F(OtlpSenderTest, AnAnswerThatCannotBeReadIsSaidOnceAndTheRecordsAreDeliver
                                     HasSubstr("its answer is not whole: too long")));
 }
 
-TEST_F(OtlpSenderTest, SaysHowMuchWasDroppedForWantOfRoomWhenSendingGoesOn) {
+TEST_F(OtlpSenderTest, LogsHowManyRecordsWereDroppedAfterTheNextDelivery) {
   client_.answers = {noAnswer("refused")};
   add("a");
   send();
@@ -245,7 +245,7 @@ TEST_F(OtlpSenderTest, SaysHowMuchWasDroppedForWantOfRoomWhenSendingGoesOn) {
   EXPECT_THAT(errors().back(), HasSubstr("dropped in all: 3"));
 }
 
-TEST_F(OtlpSenderTest, AtTheEndSaysWhatIsLost) {
+TEST_F(OtlpSenderTest, AtTheEndLogsLostRecords) {
   client_.answers = {noAnswer("refused")};
   add("a");
   send();
@@ -254,7 +254,7 @@ TEST_F(OtlpSenderTest, AtTheEndSaysWhatIsLost) {
   EXPECT_THAT(errors().back(), HasSubstr("records lost that could not be sent to http://fleet/v1/logs: 2"));
 }
 
-TEST_F(OtlpSenderTest, InAHurryTriesOnceMoreUnlessTheEndpointAskedToWait) {
+TEST_F(OtlpSenderTest, WithoutRetryDelayTriesOnceMoreUnlessTheEndpointAskedToWait) {
   client_.answers = {noAnswer("refused"), answerOf(429, "", "60")};
   add("a");
   send();

@@ -16,7 +16,7 @@ RetryPolicy withJitter(double jitter) {
   return RetryPolicy([jitter] { return jitter; });
 }
 
-TEST(RetryPolicyTest, TriesAgainOnlyWhereThatCanHelp) {
+TEST(RetryPolicyTest, TriesAgainOnlyAfterTemporaryFailures) {
   for (const int status : {0, 429, 502, 503, 504}) EXPECT_EQ(RetryPolicy::verdictOf(status), Verdict::kRetry);
   for (const int status : {300, 301, 307, 308, 400, 401, 403, 404, 415, 500, 501, 505, 599}) {
     EXPECT_EQ(RetryPolicy::verdictOf(status), Verdict::kDrop) << status;
@@ -37,7 +37,7 @@ TEST(RetryPolicyTest, JitterTakesUpToHalfOfTheWait) {
   EXPECT_NEAR(secondsOf(withJitter(0.5).delayAfterFailure(std::nullopt)), 3.75, 1e-6);
 }
 
-TEST(RetryPolicyTest, ASuccessBeginsAnew) {
+TEST(RetryPolicyTest, ASuccessResetsTheInterval) {
   RetryPolicy policy = withJitter(1.0);
   policy.delayAfterFailure(std::nullopt);
   policy.delayAfterFailure(std::nullopt);
@@ -45,7 +45,7 @@ TEST(RetryPolicyTest, ASuccessBeginsAnew) {
   EXPECT_NEAR(secondsOf(policy.delayAfterFailure(std::nullopt)), 5.0, 1e-6);
 }
 
-TEST(RetryPolicyTest, WaitsAsLongAsTheEndpointAsksWithinReason) {
+TEST(RetryPolicyTest, WaitsAsLongAsTheEndpointAsksWithinLimits) {
   RetryPolicy policy = withJitter(0.0);
   EXPECT_EQ(policy.delayAfterFailure(seconds(120)), seconds(120));
   EXPECT_EQ(policy.delayAfterFailure(seconds(0)), RetryPolicy::kShortestAsked);
@@ -62,13 +62,13 @@ TEST(RetryAfterTest, IsSecondsOrADate) {
   EXPECT_EQ(parseRetryAfter("Sun, 06 Nov 1994 08:48:47 GMT", kNow + 100), seconds(0));
 }
 
-TEST(RetryAfterTest, IsNothingElse) {
+TEST(RetryAfterTest, RefusesOtherTexts) {
   for (const char* text : {"", " ", "-5", "soon", "1.5", "12 monkeys", "Sun, 06 Nov 1994", "0x10"}) {
     EXPECT_EQ(parseRetryAfter(text, 0.0), std::nullopt) << text;
   }
 }
 
-TEST(RetryAfterTest, NumbersBeyondAllBoundsAreVeryLong) {
+TEST(RetryAfterTest, HugeNumbersAreTheLongestTime) {
   EXPECT_GT(parseRetryAfter("99999999999999999999999999", 0.0), seconds(100'000));
 }
 

@@ -70,12 +70,12 @@ TYPED_TEST(PreferenceStoreContract, ReadsWhatWasWritten) {
   EXPECT_EQ(this->store().readAll(kDomain), values);
 }
 
-TYPED_TEST(PreferenceStoreContract, WhatIsNowhereReadsAsNothing) {
+TYPED_TEST(PreferenceStoreContract, AnUnsetKeyReadsAsNone) {
   EXPECT_EQ(this->store().read(kDomain, "a"), std::nullopt);
   EXPECT_EQ(this->store().readAll(kDomain), ValueMap());
 }
 
-TYPED_TEST(PreferenceStoreContract, WhatWasWrittenOverlaysTheConfiguration) {
+TYPED_TEST(PreferenceStoreContract, AWrittenValueOverridesTheConfiguration) {
   this->configure({{"a", 1}, {"b", 2}});
   EXPECT_EQ(this->store().read(kDomain, "a"), Value(1));
   EXPECT_FALSE(this->store().write(kDomain, "a", 5));
@@ -90,7 +90,7 @@ TYPED_TEST(PreferenceStoreContract, RemovingAWrittenValueShowsTheConfigurationAg
   EXPECT_EQ(this->store().read(kDomain, "a"), Value(1));
 }
 
-TYPED_TEST(PreferenceStoreContract, WhatOnlyTheConfigurationHoldsCannotBeRemoved) {
+TYPED_TEST(PreferenceStoreContract, AValueOfTheConfigurationCannotBeRemoved) {
   this->configure({{"a", 1}});
   std::string problem;
   EXPECT_EQ(this->store().remove(kDomain, "a", &problem), std::errc::operation_not_permitted);
@@ -98,7 +98,7 @@ TYPED_TEST(PreferenceStoreContract, WhatOnlyTheConfigurationHoldsCannotBeRemoved
   EXPECT_EQ(this->store().read(kDomain, "a"), Value(1));
 }
 
-TYPED_TEST(PreferenceStoreContract, WhatIsNowhereCannotBeRemoved) {
+TYPED_TEST(PreferenceStoreContract, AnUnsetKeyCannotBeRemoved) {
   EXPECT_EQ(this->store().remove(kDomain, "a"), std::errc::no_such_file_or_directory);
   EXPECT_FALSE(this->store().write(kDomain, "a", 1));
   EXPECT_FALSE(this->store().remove(kDomain, "a"));
@@ -114,7 +114,7 @@ TYPED_TEST(PreferenceStoreContract, LaterChangesOfTheConfigurationShowWhereNothi
   EXPECT_EQ(this->store().read(kDomain, "b"), Value(2));
 }
 
-TYPED_TEST(PreferenceStoreContract, AnotherKindOfValueIsAnotherValue) {
+TYPED_TEST(PreferenceStoreContract, ValuesOfDifferentTypesDiffer) {
   this->configure({{"a", 1}});
   EXPECT_FALSE(this->store().write(kDomain, "a", true));
   EXPECT_EQ(this->store().read(kDomain, "a")->kind(), Value::Kind::kBoolean);

@@ -56,7 +56,7 @@ TEST_F(TomlPreferenceStoreTest, TheWrittenFileHoldsOnlyWhatDiffers) {
 }
 
 // Read with a replacement, it would be written back with one.
-TEST_F(TomlPreferenceStoreTest, AFileThatIsNotUtf8IsSaidNotToParseAndNotOverwritten) {
+TEST_F(TomlPreferenceStoreTest, AFileThatIsNotUtf8IsLoggedAndNotOverwritten) {
   const std::string contents = "name = \"Caf\xE9\"\n";
   write(written(), contents);
   EXPECT_EQ(store_.read(kDomain, "name"), std::nullopt);
@@ -142,7 +142,7 @@ TEST_F(TomlPreferenceStoreTest, AFileThatDoesNotParseIsNotOverwritten) {
   EXPECT_EQ(store_.readAll(kDomain), (ValueMap{{"a", 1}, {"b", 2}, {"c", 3}}));
 }
 
-TEST_F(TomlPreferenceStoreTest, AConfigurationThatDoesNotParseHindersNoWrite) {
+TEST_F(TomlPreferenceStoreTest, AnInvalidConfigurationDoesNotPreventWrites) {
   write(configured(), "nonsense");
   EXPECT_FALSE(store_.write(kDomain, "a", 1));
   EXPECT_EQ(store_.read(kDomain, "a"), Value(1));
@@ -164,7 +164,7 @@ TEST_F(TomlPreferenceStoreTest, AStateDirectoryThatCannotBeMadeIsNamed) {
   EXPECT_THAT(problem, HasSubstr(directory_.path("state")));
 }
 
-TEST_F(TomlPreferenceStoreTest, WhatACrashLeftBehindDoesNoHarm) {
+TEST_F(TomlPreferenceStoreTest, LeftoversOfACrashDoNoHarm) {
   std::filesystem::create_directories(directory_.path("state"));
   std::filesystem::create_symlink(directory_.path("elsewhere"), written() + ".new");
   EXPECT_FALSE(store_.write(kDomain, "a", 1));
@@ -173,7 +173,7 @@ TEST_F(TomlPreferenceStoreTest, WhatACrashLeftBehindDoesNoHarm) {
   EXPECT_FALSE(std::filesystem::exists(written() + ".new"));
 }
 
-TEST_F(TomlPreferenceStoreTest, APipeInAFilesPlaceHoldsNobody) {
+TEST_F(TomlPreferenceStoreTest, APipeInAFilesPlaceDoesNotBlock) {
   std::filesystem::create_directories(directory_.path("state"));
   ASSERT_EQ(mkfifo(written().c_str(), 0600), 0);
   EXPECT_EQ(store_.read(kDomain, "a"), std::nullopt);
@@ -205,14 +205,14 @@ class PreferencesOfRootTest : public TomlPreferenceStoreTest {
   TomlPreferenceStore roots_{directory_.path("configuration"), preferences_, category_};
 };
 
-TEST_F(PreferencesOfRootTest, WhatRootWritesIsTheStateDirectorysOwners) {
+TEST_F(PreferencesOfRootTest, FilesThatRootWritesBelongToTheDirectorysOwner) {
   EXPECT_FALSE(roots_.write(kDomain, "a", 1));
   for (const char* made : {"", "/.lock", "/com.orvane.test.toml"}) {
     EXPECT_EQ(ownerOf(preferences_ + made), kDaemons) << made;
   }
 }
 
-TEST_F(PreferencesOfRootTest, TheDaemonGoesOnWritingWhereRootHasWritten) {
+TEST_F(PreferencesOfRootTest, TheDaemonCanWriteAfterRootHasWritten) {
   EXPECT_FALSE(roots_.write(kDomain, "a", 1));
   runAsOtherUser([&] {
     TomlPreferenceStore daemons(directory_.path("configuration"), preferences_, category_);
@@ -224,7 +224,7 @@ TEST_F(PreferencesOfRootTest, TheDaemonGoesOnWritingWhereRootHasWritten) {
   EXPECT_EQ(roots_.read(kDomain, "b"), Value(2));
 }
 
-TEST_F(PreferencesOfRootTest, NothingIsGivenAwayThatWasThereBefore) {
+TEST_F(PreferencesOfRootTest, ExistingFilesKeepTheirOwner) {
   const std::string secret = directory_.path("secret");
   write(secret, "root's\n");
   std::filesystem::create_directory(preferences_);

@@ -69,13 +69,13 @@ events = ["com.orvane.*"]
           {"consumers", ValueArray{ValueMap{{"name", "local"}, {"events", ValueArray{"com.orvane.*"}}}}}}));
 }
 
-TEST(TomlTextTest, AProblemSaysWhere) {
+TEST(TomlTextTest, AProblemHasItsPosition) {
   std::string problem;
   EXPECT_FALSE(parseToml("a = 1\nb = oops\n", problem));
   EXPECT_EQ(problem.substr(0, 2), "2:") << problem;
 }
 
-TEST(TomlTextTest, NestingWithoutEndIsRefused) {
+TEST(TomlTextTest, DeepNestingIsRefused) {
   std::string problem;
   EXPECT_FALSE(parseToml("a = " + std::string(100'000, '['), problem));
 }

@@ -66,7 +66,7 @@ TEST(AudioIssueDetectedTest, ReadsWhatItWrites) {
   EXPECT_EQ(record, sample());
 }
 
-TEST(AudioIssueDetectedTest, LeavesFieldsThatTheInputLacksAsTheyAre) {
+TEST(AudioIssueDetectedTest, KeepsFieldsThatAreNotInTheInput) {
   AudioIssueDetected record = sample();
   EXPECT_TRUE(read(record, bytes({0x10, 0x07})));
   EXPECT_EQ(record.duration, 7U);

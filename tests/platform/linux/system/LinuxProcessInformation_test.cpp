@@ -25,7 +25,7 @@ class MadeProc {
   TemporaryDirectory directory_;
 };
 
-TEST(LinuxProcessInformationTest, KnowsItself) {
+TEST(LinuxProcessInformationTest, KnowsThisProcess) {
   const LinuxProcessInformation processes;
   EXPECT_EQ(processes.ownProcessIdentifier(), getpid());
   const auto name = processes.processName(getpid());

@@ -76,7 +76,7 @@ TEST_F(LinuxSystemInformationTest, TheHottestZoneCounts) {
   EXPECT_EQ(thermalLevel(), 2);
 }
 
-TEST_F(LinuxSystemInformationTest, WhatIsSwitchedOffUnsetOrUnreadableDoesNotCount) {
+TEST_F(LinuxSystemInformationTest, DisabledUnsetAndUnreadableOnesDoNotCount) {
   makeZone(0, 99'000, {{"critical", 90'000}});
   write("class/thermal/thermal_zone0/mode", "disabled");
   makeZone(1, 50'000, {{"critical", 0}, {"hot", -274'000}, {"strange", 10'000}});
@@ -109,7 +109,7 @@ TEST_F(LinuxSystemInformationTest, TheFirmwaresLowPowerProfileIsLowPowerMode) {
   }
 }
 
-TEST_F(LinuxSystemInformationTest, TheQuietProfileStandsInWhereThereIsNoLowPowerOne) {
+TEST_F(LinuxSystemInformationTest, TheQuietProfileCountsIfThereIsNoLowPowerProfile) {
   write("firmware/acpi/platform_profile_choices", "quiet balanced performance");
   write("firmware/acpi/platform_profile", "quiet");
   EXPECT_TRUE(isLowPower());

@@ -97,7 +97,7 @@ class PowerProfileWatcherTest : public testing::Test {
   Reports reports_;
 };
 
-TEST_F(PowerProfileWatcherTest, TellsTheProfileThatItFindsAndItsChanges) {
+TEST_F(PowerProfileWatcherTest, ReportsThePresentProfileAndItsChanges) {
   FakeService service(bus_.address(), "power-saver");
   const PowerProfileWatcher watcher([this](bool isPowerSaver) { reports_.add(isPowerSaver); },
                                     bus_.address());
@@ -120,7 +120,7 @@ TEST_F(PowerProfileWatcherTest, NoticesAServiceThatStartsLaterAndOneThatEnds) {
   EXPECT_EQ(nextReport(other), false);
 }
 
-TEST(PowerProfileWatcherWithoutBusTest, SaysNothingAndEndsAtOnce) {
+TEST(PowerProfileWatcherWithoutBusTest, ReportsNothingAndEndsAtOnce) {
   const TemporaryDirectory directory;
   bool wasTold = false;
   {

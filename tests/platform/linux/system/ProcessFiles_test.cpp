@@ -42,7 +42,7 @@ TEST_F(ProcessFilesTest, SaysThatThereIsNoSuchDirectory) {
   EXPECT_EQ(error_, std::errc::no_such_file_or_directory);
 }
 
-TEST_F(ProcessFilesTest, TellsAProcessThatIsGoneFromOneThatCannotBeRead) {
+TEST_F(ProcessFilesTest, DistinguishesEndedFromUnreadableProcesses) {
   put("4/stat", "4 (a\xFF) S");
   put("4/status", "");
   std::string bytes;

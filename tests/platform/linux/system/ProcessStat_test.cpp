@@ -13,7 +13,7 @@ using testing::SizeIs;
 
 const std::string kFields = " S 1 2 3 4 5 6 7 8 9 10 1200 300 13 14 15 16 4";
 
-TEST(ProcessStatTest, TakesNameAndFieldsApart) {
+TEST(ProcessStatTest, ParsesNameAndFields) {
   const std::string text = "42 (pipewire)" + kFields + " 18 19\n";
   const auto stat = ProcessStat::parse(text);
   ASSERT_TRUE(stat);
@@ -43,7 +43,7 @@ TEST(ProcessStatTest, IsNoneWithoutANameOrAField) {
   EXPECT_FALSE(ProcessStat::parse(whole.substr(0, whole.rfind(' '))));
 }
 
-TEST(ProcessStatTest, WordsAreWhatIsBetweenWhiteSpace) {
+TEST(ProcessStatTest, SplitsAtWhiteSpace) {
   EXPECT_THAT(splitWhitespace("  one\ttwo\n three"), ElementsAre("one", "two", "three"));
   EXPECT_THAT(splitWhitespace(" \n"), IsEmpty());
 }

@@ -46,14 +46,14 @@ TEST_F(ServiceManagerTest, IsPinged) {
   EXPECT_THAT(socket.take(), ElementsAre("WATCHDOG=1", "WATCHDOG=1"));
 }
 
-TEST_F(ServiceManagerTest, AWatchThatAPingOnItsWayWouldStartAnewEndsWhenTheEndBegins) {
+TEST_F(ServiceManagerTest, TheWatchdogIsSwitchedOffWhenTheEndBegins) {
   set("NOTIFY_SOCKET", socket.path());
   set("WATCHDOG_USEC", "1000000");
   manager.tellStopping("Finishing");
   EXPECT_THAT(socket.take(), ElementsAre("STOPPING=1\nWATCHDOG_USEC=0\nSTATUS=Finishing"));
 }
 
-TEST_F(ServiceManagerTest, WithoutTheVariableNothingIsTold) {
+TEST_F(ServiceManagerTest, WithoutTheVariableNothingIsSent) {
   manager.tellReady("Listening");
   manager.ping();
   manager.tellStopping("Finishing");
@@ -61,7 +61,7 @@ TEST_F(ServiceManagerTest, WithoutTheVariableNothingIsTold) {
   EXPECT_EQ(manager.pingInterval(), std::nullopt);
 }
 
-TEST_F(ServiceManagerTest, ASocketThatIsGoneIsNoHarm) {
+TEST_F(ServiceManagerTest, AMissingSocketDoesNoHarm) {
   set("NOTIFY_SOCKET", "/nowhere/notify");
   manager.tellReady("Listening");
   manager.ping();
@@ -83,14 +83,14 @@ TEST_F(ServiceManagerTest, WantsNoPingsOfAnotherProcess) {
   EXPECT_EQ(manager.pingInterval(), std::nullopt);
 }
 
-TEST_F(ServiceManagerTest, ATimeOutThatIsNoneMeansNoPings) {
+TEST_F(ServiceManagerTest, AnInvalidTimeoutMeansNoPings) {
   for (const char* wrong : {"", "0", "-1", "soon", "18446744073709551615"}) {
     set("WATCHDOG_USEC", wrong);
     EXPECT_EQ(manager.pingInterval(), std::nullopt) << wrong;
   }
 }
 
-TEST_F(ServiceManagerTest, ThePingsIntervalIsBounded) {
+TEST_F(ServiceManagerTest, ThePingIntervalIsLimited) {
   set("WATCHDOG_USEC", "1");
   EXPECT_EQ(manager.pingInterval(), 1ms);
   set("WATCHDOG_USEC", "18446744073709551613");

@@ -41,7 +41,7 @@ TEST_F(WatchdogFeederTest, PingsOnceAnIntervalHoweverOftenItIsAsked) {
   EXPECT_EQ(pings, 3);
 }
 
-TEST_F(WatchdogFeederTest, PingsThatWereMissedAreMadeUpForByOne) {
+TEST_F(WatchdogFeederTest, OnePingReplacesMissedOnes) {
   feeder.pingIfDue();
   advanceAndPing(35s);
   EXPECT_EQ(pings, 2);

@@ -34,7 +34,7 @@ TEST(TracingSetupTest, TheLibraryIsTheUsualOneUnlessTheVariableHoldsAPath) {
   ::unsetenv("TONEWERK_SIGNPOSTS");
 }
 
-TEST(TracingSetupTest, TracesLieBelowTheStateWhereverOneStands) {
+TEST(TracingSetupTest, TheTracesDirectoryIsAbsolute) {
   EXPECT_EQ(tracesDirectory("/var/lib/tonewerk"), "/var/lib/tonewerk/traces");
   EXPECT_EQ(tracesDirectory("state"), std::filesystem::current_path() / "state/traces");
 }

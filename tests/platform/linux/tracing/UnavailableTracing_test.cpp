@@ -32,7 +32,7 @@ TEST(UnavailableTracingTest, AStartSaysWhyThereIsNoTrace) {
   EXPECT_THAT(listener->heard, ElementsAre("start not built in"));
 }
 
-TEST(UnavailableTracingTest, NobodyNeedsToListen) {
+TEST(UnavailableTracingTest, WorksWithoutADelegate) {
   UnavailableRuntrace runtrace("not built in");
   const auto session = runtrace.makeSession({});
   session->startRuntrace();

@@ -92,7 +92,7 @@ TEST_F(CollectorsTest, ListsProcessesThatHadTheMostProcessorTimeFirst) {
                 "      10        1 S       3         0.50            0            0          0  idle\n"));
 }
 
-TEST_F(CollectorsTest, SaysHowManyProcessesItLeftOut) {
+TEST_F(CollectorsTest, NamesTheNumberOfProcessesLeftOut) {
   for (int identifier = 1; identifier <= 3; ++identifier) putProcess(identifier, "p", 0, "");
   EXPECT_EQ(ProcessTableCollector(directory.path(), 3).collect().problem, "");
   const DiagnosticCollector::Result result = ProcessTableCollector(directory.path(), 2).collect();
@@ -136,7 +136,7 @@ TEST_F(CollectorsTest, CollectsSoundDevicesInOrderWithoutFollowingLinks) {
                              "\nstate: RUNNING\n== " + directory.path("cards") + "\n 0 [Dummy ]\n");
 }
 
-TEST_F(CollectorsTest, BoundsWhatItTakesOfSoundDevices) {
+TEST_F(CollectorsTest, LimitsFilesAndBytesOfSoundDevices) {
   put("a", "12345");
   put("b/c", "12345");
   put("b/d/e", "deep");
@@ -152,7 +152,7 @@ TEST_F(CollectorsTest, BoundsWhatItTakesOfSoundDevices) {
   EXPECT_EQ(cut.text, "== " + directory.path("a") + "\n12345\n");
 }
 
-TEST_F(CollectorsTest, CutsWhatASoundDeviceSaysBetweenCharacters) {
+TEST_F(CollectorsTest, CutsTheFileOfASoundDeviceBetweenCharacters) {
   put("a", "123\u00E9");
   EXPECT_THAT(SoundStatusCollector(directory.path(), {3, 4, 1000, 2}).collect().text,
               HasSubstr("\n123\n(cut)\n"));
@@ -164,7 +164,7 @@ TEST_F(CollectorsTest, SaysWhenThereAreNoSoundDevices) {
   EXPECT_EQ(result.problem, directory.path("asound") + ": No such file or directory");
 }
 
-TEST_F(CollectorsTest, CollectsWhatPipeWireSays) {
+TEST_F(CollectorsTest, CollectsPipeWiresGraph) {
   const DiagnosticCollector::Result result = PipeWireGraphCollector({"echo", "[]"}).collect();
   EXPECT_EQ(result.text, "[]\n");
   EXPECT_EQ(result.problem, "");
@@ -182,7 +182,7 @@ TEST_F(CollectorsTest, SaysWhyThereIsNoPipeWireGraph) {
   EXPECT_EQ(endless.text.size(), 1000u);
 }
 
-TEST_F(CollectorsTest, GoesFromTheQuickestToTheSlowest) {
+TEST_F(CollectorsTest, RunsTheQuickestCollectorsFirst) {
   std::vector<std::string> names;
   for (const auto& collector : makeStandardCollectors(std::make_shared<RecentLines>())) {
     names.emplace_back(collector->fileName());

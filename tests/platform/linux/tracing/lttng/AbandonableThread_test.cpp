@@ -12,7 +12,7 @@ namespace {
 
 using namespace std::chrono_literals;
 
-TEST(AbandonableThreadTest, RunsPiecesInOrderAndAllOfThemBeforeItEnds) {
+TEST(AbandonableThreadTest, RunsAllTasksInOrderBeforeItEnds) {
   std::vector<int> ran;
   {
     const AbandonableThread thread(1h);
@@ -22,7 +22,7 @@ TEST(AbandonableThreadTest, RunsPiecesInOrderAndAllOfThemBeforeItEnds) {
   for (int i = 0; i < 100; ++i) EXPECT_EQ(ran[static_cast<std::size_t>(i)], i);
 }
 
-TEST(AbandonableThreadTest, PiecesMayPostMore) {
+TEST(AbandonableThreadTest, TasksMayPostMore) {
   bool ran = false;
   {
     const AbandonableThread thread(1h);
@@ -47,7 +47,7 @@ TEST(AbandonableThreadTest, SaysHowLongItHasBeenBusy) {
 }
 
 // What a frozen session daemon does to the daemon's end.
-TEST(AbandonableThreadTest, LeavesAPieceBehindThatDoesNotReturn) {
+TEST(AbandonableThreadTest, AbandonsATaskThatDoesNotReturn) {
   const auto proceed = std::make_shared<std::promise<void>>();
   const auto ended = std::make_shared<std::promise<void>>();
   {
@@ -61,7 +61,7 @@ TEST(AbandonableThreadTest, LeavesAPieceBehindThatDoesNotReturn) {
   ended->get_future().wait();
 }
 
-TEST(AbandonableThreadTest, TakesNoWorkOnceItHasEnded) {
+TEST(AbandonableThreadTest, AcceptsNoTasksAfterItHasEnded) {
   std::shared_ptr<AbandonableThread::Queue> queue;
   {
     const AbandonableThread thread(1h);

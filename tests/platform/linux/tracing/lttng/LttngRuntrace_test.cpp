@@ -99,7 +99,7 @@ TEST_F(LttngRuntraceTest, RecordsHowLongIntervalsTook) {
   }
 }
 
-TEST_F(LttngRuntraceTest, KeepsThreadsApartAndLeavesOutWhatTheEdgesCut) {
+TEST_F(LttngRuntraceTest, KeepsThreadsApartAndLeavesOutIncompleteIntervals) {
   signpost::begin("decode", 1);
   const auto session = startWell();
   signpost::end("decode", 1);
@@ -138,7 +138,7 @@ TEST_F(LttngRuntraceTest, TracesOnlyWhatTheListNames) {
   for (const KolviProbe& probe : all) EXPECT_THAT(probe.events, IsEmpty()) << probe.name;
 }
 
-TEST_F(LttngRuntraceTest, TakesTheLongestListThereMayBe) {
+TEST_F(LttngRuntraceTest, AcceptsTheLongestList) {
   std::string probes = "[";
   for (int i = 0; i < 200; ++i) {
     const std::string name = std::to_string(i) + std::string(197, '*');
@@ -167,7 +167,7 @@ TEST_F(LttngRuntraceTest, OneTraceAfterTheOtherEachHasItsOwn) {
   }
 }
 
-TEST_F(LttngRuntraceTest, TheTraceGoesWithItsToken) {
+TEST_F(LttngRuntraceTest, TheTraceIsRemovedWithItsToken) {
   const auto session = startWell();
   finish(*session);
   rig_.runtrace.reset();  // whose thread may have held it until now
@@ -176,7 +176,7 @@ TEST_F(LttngRuntraceTest, TheTraceGoesWithItsToken) {
   EXPECT_FALSE(fs::exists(listener_->location));
 }
 
-TEST_F(LttngRuntraceTest, ASessionThatIsGivenUpLeavesNothing) {
+TEST_F(LttngRuntraceTest, AnAbandonedSessionLeavesNothing) {
   auto session = startWell();
   session.reset();
   listener_ = std::make_shared<TraceListener>();
@@ -190,7 +190,7 @@ TEST_F(LttngRuntraceTest, ASessionThatIsGivenUpLeavesNothing) {
   }
 }
 
-TEST_F(LttngRuntraceTest, ASessionThatIsGivenUpWhileItStopsStillCompletes) {
+TEST_F(LttngRuntraceTest, ASessionThatIsAbandonedWhileItStopsStillCompletes) {
   auto session = startWell();
   session->stopRuntrace();
   session.reset();
@@ -198,7 +198,7 @@ TEST_F(LttngRuntraceTest, ASessionThatIsGivenUpWhileItStopsStillCompletes) {
   EXPECT_EQ(listener_->completionError, std::nullopt);
 }
 
-TEST_F(LttngRuntraceTest, AStopWithoutAStartIsNothing) {
+TEST_F(LttngRuntraceTest, AStopWithoutAStartDoesNothing) {
   const auto session = rig_.runtrace->makeSession({.probeListPath = "/nowhere"});
   session->setDelegate(listener_);
   session->stopRuntrace();
@@ -208,7 +208,7 @@ TEST_F(LttngRuntraceTest, AStopWithoutAStartIsNothing) {
   EXPECT_EQ(listener_->stopError, std::nullopt);
 }
 
-TEST_F(LttngRuntraceTest, ADelegateThatIsTakenAwayHearsNothing) {
+TEST_F(LttngRuntraceTest, ARemovedDelegateIsNotCalled) {
   const auto session = startWell();
   session->setDelegate({});
   session->stopRuntrace();
@@ -327,7 +327,7 @@ TEST(LttngRuntraceTimesTest, AFrozenSessionDaemonIsKilledAndTheCallFails) {
   EXPECT_TRUE(listener->completionError.has_value());
 }
 
-TEST(FiltersForTest, PicksEachNameAndNoPattern) {
+TEST(FiltersForTest, MatchesNamesAndNoPatterns) {
   EXPECT_THAT(filtersFor({"decode", "mix"}), ElementsAre(R"(name == "decode" || name == "mix")"));
   EXPECT_THAT(filtersFor({R"(a*\)"}), ElementsAre(R"(name == "a\*\\")"));
   EXPECT_THAT(filtersFor({}), IsEmpty());
@@ -410,7 +410,7 @@ TEST_F(TraceReaderKolviTest, AReaderThatIsMissingIsAnError) {
   EXPECT_THAT(problem, StartsWith("tw-trace-reader: "));
 }
 
-TEST_F(TraceReaderKolviTest, AReaderThatTalksNonsenseIsAnError) {
+TEST_F(TraceReaderKolviTest, InvalidOutputOfTheReaderIsAnError) {
   EXPECT_EQ(problemWith("echo nonsense"), "the trace reader's answer is not whole");
 }
 

@@ -49,13 +49,13 @@ TEST_F(ProbeListReaderTest, SaysWhatIsWrongWithTheFile) {
   EXPECT_EQ(read(R"({"name": "a"})").problem, "the probe list /probes.json names no signpost");
 }
 
-TEST_F(ProbeListReaderTest, TakesABoundedNumberOfSignposts) {
+TEST_F(ProbeListReaderTest, LimitsTheNumberOfSignposts) {
   EXPECT_EQ(read(intervals(WantedSignposts::kMax)).problem, "");
   EXPECT_EQ(read(intervals(WantedSignposts::kMax + 1)).problem,
             "the probe list /probes.json names more than 200 signposts");
 }
 
-TEST_F(ProbeListReaderTest, TakesNamesThatSignpostsCanHave) {
+TEST_F(ProbeListReaderTest, AcceptsNamesThatSignpostsCanHave) {
   const std::string longest(WantedSignposts::kMaxNameBytes, 'x');
   EXPECT_THAT(read(interval(longest)).names, SizeIs(1));
   EXPECT_THAT(read(interval("grün *? \\\\ '")).names, ElementsAre("grün *? \\ '"));

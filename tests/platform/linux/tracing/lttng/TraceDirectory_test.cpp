@@ -22,7 +22,7 @@ class TraceDirectoryTest : public testing::Test {
   std::error_code error_;
 };
 
-TEST_F(TraceDirectoryTest, LivesAsLongAsSomebodyKeepsIt) {
+TEST_F(TraceDirectoryTest, ExistsAsLongAsItsOwner) {
   auto directory = make("one");
   ASSERT_NE(directory, nullptr);
   EXPECT_EQ(directory->path(), root_.path("traces/one"));
@@ -33,7 +33,7 @@ TEST_F(TraceDirectoryTest, LivesAsLongAsSomebodyKeepsIt) {
   EXPECT_TRUE(fs::exists(root_.path("traces/one/ust/uid/metadata")));
 }
 
-TEST_F(TraceDirectoryTest, GoesWithAllThatIsInIt) {
+TEST_F(TraceDirectoryTest, IsRemovedWithItsContents) {
   {
     const auto directory = make("one");
     fs::create_directories(directory->path() + "/ust/uid");
@@ -43,12 +43,12 @@ TEST_F(TraceDirectoryTest, GoesWithAllThatIsInIt) {
   EXPECT_TRUE(fs::exists(root_.path("traces")));
 }
 
-TEST_F(TraceDirectoryTest, IsForItsOwnerAlone) {
+TEST_F(TraceDirectoryTest, IsAccessibleToItsOwnerOnly) {
   const auto directory = make("one");
   EXPECT_EQ(fs::status(directory->path()).permissions(), fs::perms::owner_all);
 }
 
-TEST_F(TraceDirectoryTest, DoesNotTakeOneThatIsThere) {
+TEST_F(TraceDirectoryTest, FailsIfItExists) {
   const auto first = make("one");
   EXPECT_EQ(make("one"), nullptr);
   EXPECT_EQ(error_, std::errc::file_exists);
@@ -60,7 +60,7 @@ TEST_F(TraceDirectoryTest, SaysWhyItCannotBeMade) {
   EXPECT_TRUE(error_);
 }
 
-TEST_F(TraceDirectoryTest, RemovesWhatAnEarlierProcessLeft) {
+TEST_F(TraceDirectoryTest, RemovesLeftoversOfAnEarlierProcess) {
   fs::create_directories(root_.path("traces/old/ust"));
   std::ofstream(root_.path("traces/session-daemon.log")) << "text";
   TraceDirectory::removeLeftovers(root_.path("traces"));

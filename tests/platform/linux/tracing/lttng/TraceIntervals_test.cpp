@@ -35,12 +35,12 @@ TEST_F(TraceIntervalsTest, NamesMayHoldNewlinesAndBackslashes) {
   EXPECT_THAT(*intervals, ElementsAre(Pair("a\nb\\n ", IsEmpty())));
 }
 
-TEST_F(TraceIntervalsTest, TheReadersOwnWordsAreTheProblem) {
+TEST_F(TraceIntervalsTest, TheReadersMessageIsTheProblem) {
   EXPECT_FALSE(parse("problem the trace has lost 12 events\n"));
   EXPECT_EQ(problem_, "the trace has lost 12 events");
 }
 
-TEST_F(TraceIntervalsTest, AnAnswerThatIsNotWholeIsRefused) {
+TEST_F(TraceIntervalsTest, AnIncompleteAnswerIsRefused) {
   for (const char* text :
        {"", "name a\n", "name a\n0 1\n", "name a\n0 1\nend", "end\nname a\n", "end\nend\n", "0 1\nend\n",
         "name a\n1 1\nend\n", "name a\n-1 1\nend\n", "name a\n0 -1\nend\n", "name a\n0\nend\n",
