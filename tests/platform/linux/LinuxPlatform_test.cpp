@@ -51,7 +51,7 @@ TEST(LinuxPlatformTest, LooksForEverythingWhereTheDirectoriesSay) {
   EXPECT_EQ(&platform.kolvi, tracing.kolvi.get());
 }
 
-// With the collectors that go with every item, on this system.
+// Runs the collectors of every item on this system.
 TEST(LinuxPlatformTest, LeavesEvidenceOfTheSystemWithAStallTrace) {
   const TemporaryDirectory root;
   LinuxPlatform linuxPlatform({root.path("run"), root.path("state"), root.path("logs"), root.path("etc")});
@@ -75,7 +75,7 @@ TEST(LinuxPlatformTest, LeavesEvidenceOfTheSystemWithAStallTrace) {
   EXPECT_THAT(read("load.txt"), HasSubstr("/proc/loadavg"));
   EXPECT_THAT(read("log.txt"), HasSubstr("error twrs a line before"));
   EXPECT_THAT(read("processes.txt"), HasSubstr(" " + std::to_string(getpid()) + " "));
-  // Sound devices and PipeWire's graph are there, or it is said why not.
+  // For sound devices and PipeWire's graph there is either a file or a problem.
   for (const std::string file : {"sound.txt", "pipewire.json"}) {
     EXPECT_TRUE(!read(file).empty() || read("request.json").find(file + "\": \"") != std::string::npos)
         << file;

@@ -27,7 +27,7 @@ using ::testing::StartsWith;
 
 constexpr double kTicks = 100.0;
 
-// A directory that looks like /proc.
+// A directory with the layout of /proc.
 class MemoryUsageTest : public ::testing::Test {
  protected:
   MemoryUsageTest() {
@@ -129,8 +129,8 @@ TEST_F(MemoryUsageTest, ThreadsOfTheKernelAndProcessesThatHaveEndedAreLeftOut) {
 }
 
 TEST_F(MemoryUsageTest, AProcessThatEndsMeanwhileIsLeftOut) {
-  std::filesystem::create_directories(directory.path("7"));  // gone before its first file was read
-  write("8/status", statusOf("halfway", 100));               // gone before its second
+  std::filesystem::create_directories(directory.path("7"));  // ended before its first file was read
+  write("8/status", statusOf("halfway", 100));               // ended before its second file was read
   const UsageSnapshot snapshot = read();
   EXPECT_THAT(snapshot.processes, IsEmpty());
   EXPECT_EQ(snapshot.unreadable, 0U);
@@ -138,7 +138,8 @@ TEST_F(MemoryUsageTest, AProcessThatEndsMeanwhileIsLeftOut) {
 
 TEST_F(MemoryUsageTest, AnUnreadableProcessIsCountedAndReported) {
   addProcess(42, "readable", 100);
-  std::filesystem::create_directories(directory.path("7/status"));  // not even root can read that
+  std::filesystem::create_directories(
+      directory.path("7/status"));  // not even root can read a directory as a file
   write("8/status", statusOf("odd", 100));
   write("8/stat", "8 (odd) S 1\n");
   EXPECT_EQ(read().unreadable, 2U);

@@ -21,7 +21,7 @@ using channels::states;
 using testing::ElementsAre;
 using testing::IsEmpty;
 
-// Channels of one driver in a file.
+// A file with the channels of one driver.
 class PublishedInFiles {
  public:
   PublishedInFiles() { std::filesystem::create_directory(directory_.path("channels")); }
@@ -73,7 +73,7 @@ class SetByTheTest {
   MemoryChanmeter chanmeter_;
 };
 
-// What every library of channels does.
+// The contract of all sources of channels.
 template <typename Source>
 class ChanmeterContract : public testing::Test {
  protected:

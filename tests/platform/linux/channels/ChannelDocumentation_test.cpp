@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// docs/driver-channels.md, its schema and its example, against the reader that they describe.
+// Compares docs/driver-channels.md, its schema and its example with the reader.
 #include <fstream>
 #include <gmock/gmock.h>
 #include <iterator>

@@ -7,8 +7,8 @@
 
 namespace tonewerk {
 
-// Holds JSON values against a JSON Schema, as far as ours go: a keyword that is not known here fits nothing,
-// so that none is passed over.
+// Validates JSON values against a JSON Schema. It supports the keywords that our schemas use. A schema with
+// another keyword matches no value, so that no keyword is ignored.
 class JsonSchema {
  public:
   explicit JsonSchema(nlohmann::json schema) : schema_(std::move(schema)) {}
@@ -61,12 +61,12 @@ class JsonSchema {
     if (type == "array") return value.is_array();
     if (type == "string") return value.is_string();
     if (type == "number") return value.is_number();
-    // An integer too long for the library is a double to it.
+    // The library reads an integer beyond 64 bits as a double.
     if (type == "integer") return value.is_number_integer() || (value.is_number() && numberOf(value) > 1e18L);
     return false;
   }
 
-  // Wide enough for all integers of 64 bits.
+  // A type that holds all signed and unsigned 64-bit integers.
   static long double numberOf(const Json& value) {
     if (value.is_number_unsigned()) return static_cast<long double>(value.get<std::uint64_t>());
     if (value.is_number_integer()) return static_cast<long double>(value.get<std::int64_t>());

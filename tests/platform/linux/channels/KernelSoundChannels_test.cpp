@@ -34,7 +34,7 @@ class KernelSoundChannelsTest : public testing::Test {
     const std::optional<std::string> subGroup;
     return read(ChannelChoice(group, subGroup));
   }
-  // As "PCH Tx pcm0 sub0 Delay".
+  // For example "PCH Tx pcm0 sub0 Delay".
   static std::vector<std::string> namesOf(const std::vector<ChanmeterRecord>& records) {
     std::vector<std::string> names;
     for (const ChanmeterRecord& record : records) {
@@ -131,7 +131,8 @@ TEST_F(KernelSoundChannelsTest, FollowsTheSubstreams) {
   EXPECT_FALSE(error_);
 }
 
-// Each running session holds a snapshot: thousands of them cost little while nothing plays.
+// Each running session keeps a snapshot. Thousands of snapshots must need little memory while nothing
+// changes.
 TEST_F(KernelSoundChannelsTest, SharesTheRecordsOfUnchangedChannels) {
   const std::optional<std::string> group = "Tx";
   const std::optional<std::string> subGroup;

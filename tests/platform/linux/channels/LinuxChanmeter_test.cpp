@@ -24,7 +24,7 @@ class LinuxChanmeterTest : public testing::Test {
  protected:
   LinuxChanmeterTest() { std::filesystem::create_directory(directory_.path("channels")); }
 
-  // Replaces the file of that name.
+  // Replaces the file with this name.
   void publish(const std::string& name, const std::string& text) const {
     const std::string other = directory_.path(name + ".new");
     std::ofstream(other) << text;
@@ -36,7 +36,7 @@ class LinuxChanmeterTest : public testing::Test {
                                   "}]}");
   }
 
-  // Of a group, or of everything.
+  // The channels of a group, or all channels.
   Chanmeter::Channels channelsIn(const std::optional<std::string>& group) {
     error_.reset();
     return chanmeter_.copyChannelsInGroup(group, std::nullopt, error_);
@@ -48,7 +48,7 @@ class LinuxChanmeterTest : public testing::Test {
     EXPECT_TRUE(subscription);
     return chanmeter_.createSamples(subscription, subscribed, error_);
   }
-  // As "Amp n=12".
+  // For example "Amp n=12".
   std::vector<std::string> textsOf(const Chanmeter::Samples& samples) {
     std::vector<std::string> texts;
     chanmeter_.iterate(*samples, [&](const ChanmeterSample& sample) {
@@ -117,7 +117,7 @@ TEST_F(LinuxChanmeterTest, GivesNoSamplesWhenNothingCouldBeRead) {
   publish("Amp.json", "{");
   EXPECT_FALSE(samplesOf(channels));
   EXPECT_EQ(code(), kChannelsNotJson);
-  // One that is gone has not failed.
+  // A removed file is not a failure.
   std::filesystem::remove(directory_.path("channels/Amp.json"));
   const auto samples = samplesOf(channels);
   ASSERT_TRUE(samples);
@@ -134,8 +134,8 @@ TEST_F(LinuxChanmeterTest, GivesASetTogetherWithAnError) {
   EXPECT_EQ(code(), kChannelsWrongType);
 }
 
-// A publisher replaces its file over and over while several threads take samples: each sample is one of the
-// published states, whole, and nothing fails.
+// A publisher replaces its file repeatedly while several threads take samples. Each sample must be one
+// complete published state, and no call may fail.
 TEST_F(LinuxChanmeterTest, SamplesWholeFilesWhileTheyAreReplaced) {
   constexpr int kChannels = 200;
   const auto fileAt = [](int value) {

@@ -50,7 +50,7 @@ class PublishedChannelsTest : public testing::Test {
 
   std::string channels() const { return directory_.path("channels"); }
   std::string path(const std::string& name) const { return channels() + "/" + name; }
-  // As publishers do: a new file in the place of the old one.
+  // Replaces a file by a new one, as publishers do.
   void publish(const std::string& name, const std::string& text) const {
     std::ofstream(directory_.path("new")) << text;
     std::filesystem::rename(directory_.path("new"), path(name));
@@ -63,7 +63,7 @@ class PublishedChannelsTest : public testing::Test {
     return records;
   }
   ChanmeterRecords readAll() { return read(ChannelChoice(none_, none_)); }
-  // As "Amp Rail Volts=12".
+  // For example "Amp Rail Volts=12".
   static std::vector<std::string> namesOf(const ChanmeterRecords& records) {
     std::vector<std::string> names;
     for (const auto& record : records) {
@@ -285,7 +285,8 @@ TEST_F(PublishedChannelsTest, ReadsBytesUpToTheLimit) {
   EXPECT_EQ(code(), 0);
 }
 
-// Or else files that are put before one another, with readings in between, are all held at once.
+// Otherwise, files that are added one before the other, with a reading after each, would all be kept in
+// memory.
 TEST_F(PublishedChannelsTest, FreesAFileThatIsBeyondTheLimitNow) {
   publish("z.json", fileOf("Z", channelOf("x")));
   const std::weak_ptr<const ChanmeterRecord> record = readAll().at(0);

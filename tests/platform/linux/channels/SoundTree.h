@@ -9,8 +9,8 @@
 
 namespace tonewerk {
 
-// What a laptop's kernel shows of its sound cards: the built-in one with a playing and a closed playback
-// substream and a capture one, and a USB headset that is asleep.
+// Imitates the kernel's files about the sound cards of a laptop. The built-in card has a playing and a closed
+// playback substream and a capture substream; a USB headset is suspended.
 class SoundTree {
  public:
   SoundTree() {
@@ -55,7 +55,7 @@ class SoundTree {
     write("proc/asound/" + name + "/sw_params",
           parameters == "closed\n" ? parameters : "tstamp_mode: ENABLE\n");
   }
-  // The one that plays.
+  // The playing substream.
   void setStatus(const std::string& status) const { write("proc/asound/card0/pcm0p/sub0/status", status); }
 
   static constexpr char kRunning[] =

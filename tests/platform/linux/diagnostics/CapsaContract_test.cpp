@@ -1,11 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What every Capsa promises, asked of the Linux adapter and of the double.
+// The contract of Capsa, for the Linux adapter and the double.
 
 #include <gmock/gmock.h>
 #include <memory>
 
-#include "platform/Log.h"
+#include "platform/LogCategory.h"
 #include "platform/linux/diagnostics/DiagnosticsStore.h"
 #include "platform/linux/diagnostics/LinuxCapsa.h"
 #include "platform/linux/threads/ThreadQueueFactory.h"

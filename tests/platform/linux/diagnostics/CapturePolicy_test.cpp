@@ -10,7 +10,7 @@
 namespace tonewerk {
 namespace {
 
-constexpr std::int64_t kToday = 20'412;  // 2025-11-20, on which a manual clock begins
+constexpr std::int64_t kToday = 20'412;  // 2025-11-20, the initial date of a manual clock
 constexpr double kMidnight = (kToday + 1) * 86'400.0;
 
 FaultsignSignature signatureOf(const std::string& type) {
@@ -35,12 +35,12 @@ class CapturePolicyTest : public testing::Test {
   CapturePolicy policy{clock, {}};
 };
 
-// The day's number.
+// The daily limit.
 
 TEST_F(CapturePolicyTest, TakesTwentyADayAndRefusesTheNext) {
   EXPECT_EQ(acceptedOf(20), 20);
   EXPECT_EQ(ask(20), kFaultsignErrorDailyLimitExceeded);
-  EXPECT_EQ(ask(0), kFaultsignErrorDailyLimitExceeded);  // also for one that would be throttled
+  EXPECT_EQ(ask(0), kFaultsignErrorDailyLimitExceeded);  // even if it would be throttled, too
   EXPECT_EQ(policy.count(), (CapturePolicy::Count{kToday, 20}));
 }
 
@@ -63,7 +63,8 @@ TEST_F(CapturePolicyTest, ContinuesTheCountOfAnEarlierProcess) {
 }
 
 TEST_F(CapturePolicyTest, TheCountOfAnotherDayDoesNotMatter) {
-  for (const std::int64_t day : {kToday - 1, kToday + 1}) {  // the later one when the clock went back
+  for (const std::int64_t day :
+       {kToday - 1, kToday + 1}) {  // the next day is possible if the clock went back
     CapturePolicy later(clock, {day, 20});
     EXPECT_EQ(later.judge(signatureOf("a"), 0.0), kFaultsignErrorNone);
     EXPECT_EQ(later.count(), (CapturePolicy::Count{kToday, 0}));

@@ -28,7 +28,7 @@ class CaptureSessionsTest : public testing::Test {
     CaptureRequest request;
   };
 
-  // No two of one signature.
+  // Each request has a different signature.
   CaptureSessions::Outcome start(double duration) {
     return sessions->start(requestOf(std::to_string(++requested), duration));
   }
@@ -104,7 +104,7 @@ TEST_F(CaptureSessionsTest, OnlyPendingCapturesCanBeCancelled) {
   EXPECT_THAT(made, SizeIs(2));
 }
 
-// Sixteen were once too few for the day's twenty.
+// Regression: a limit of 16 was below the daily limit of 20.
 TEST_F(CaptureSessionsTest, ADaysCapturesMayAllBePending) {
   for (int n = 0; n < CapturePolicy::kMaxPerDay; ++n) EXPECT_EQ(start(60.0).error, kFaultsignErrorNone) << n;
   EXPECT_EQ(start(60.0).error, kFaultsignErrorDailyLimitExceeded);
@@ -115,7 +115,7 @@ TEST_F(CaptureSessionsTest, ADaysCapturesMayAllBePending) {
 TEST_F(CaptureSessionsTest, TheNumberOfPendingCapturesIsLimited) {
   std::string first;
   for (std::size_t n = 0; n < CaptureSessions::kMaxPending; ++n) {
-    // Another day by the wall clock, to which it jumped.
+    // The wall clock jumps to another day.
     if (n > 0 && n % CapturePolicy::kMaxPerDay == 0) clock.setNow(clock.now() + 86'400.0);
     const CaptureSessions::Outcome outcome = start(60.0);
     EXPECT_EQ(outcome.error, kFaultsignErrorNone);
@@ -124,7 +124,7 @@ TEST_F(CaptureSessionsTest, TheNumberOfPendingCapturesIsLimited) {
   clock.setNow(clock.now() + 86'400.0);
   EXPECT_EQ(start(60.0).error, kFaultsignErrorServiceUnavailable);
   EXPECT_EQ(snapshot().error, kFaultsignErrorNone);
-  EXPECT_EQ(sessions->count().accepted, 1);  // what found no place does not count
+  EXPECT_EQ(sessions->count().accepted, 1);  // a capture without a place is not counted
   EXPECT_TRUE(sessions->cancel(first));
   EXPECT_EQ(start(60.0).error, kFaultsignErrorNone);
 }
@@ -191,7 +191,8 @@ TEST_F(CaptureSessionsTest, ATickAfterTheSessionsAreGoneDoesNothing) {
   EXPECT_THAT(made, IsEmpty());
 }
 
-// With threads: each capture is either cancelled or made, never both, and none is made after the end.
+// With several threads, each capture is either cancelled or made, never both, and none is made after
+// finish().
 TEST(CaptureSessionsThreadsTest, ACaptureIsEitherCancelledOrMade) {
   const SystemClock clock;
   TimerThread timers;

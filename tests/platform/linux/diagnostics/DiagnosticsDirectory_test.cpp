@@ -23,7 +23,8 @@ class DiagnosticsDirectoryTest : public testing::Test {
     std::ofstream(path) << text;
   }
 
-  // Seconds ahead of now, so that what is made later can be made older.
+  // Sets the modification time, in seconds from now. Items with a time in the future are newer than later
+  // ones.
   void setAge(const std::string& name, int seconds) {
     fs::last_write_time(root.path(name), fs::file_time_type::clock::now() + std::chrono::seconds(seconds));
   }
@@ -54,7 +55,7 @@ TEST_F(DiagnosticsDirectoryTest, MakesReadsListsAndRemovesItems) {
   EXPECT_EQ(files[0].name, "a.txt");
   EXPECT_EQ(files[1].bytes, 4u);
   EXPECT_EQ(items.readFile(DiagnosticKind::kWhirlcap, "one", "b.txt"), "1234");
-  EXPECT_EQ(items.listAll().at(0).bytes, 2u * 4096);  // the folder's and a file's block
+  EXPECT_EQ(items.listAll().at(0).bytes, 2u * 4096);  // one block for the folder and one for a file
   EXPECT_FALSE(items.remove(DiagnosticKind::kWhirlcap, "one"));
   EXPECT_FALSE(fs::exists(root.path("state/whirlcaps/one")));
   EXPECT_TRUE(fs::is_empty(root.path("state/whirlcaps")));
@@ -128,7 +129,7 @@ TEST_F(DiagnosticsDirectoryTest, SweepsLeftoversOfACrash) {
   EXPECT_EQ(items.sweep(), 2u);
   EXPECT_TRUE(fs::is_empty(root.path("state/captures")));
   EXPECT_TRUE(items.contains(DiagnosticKind::kWhirlcap, "item"));
-  // A leftover does not hold up the item that it was to be.
+  // A leftover does not prevent writing the same item again.
   put("state/captures/.next.new/request.json", "{");
   EXPECT_FALSE(items.write(DiagnosticKind::kCapture, "next", {{"request.json", "{}"}}));
   EXPECT_EQ(items.readFile(DiagnosticKind::kCapture, "next", "request.json"), "{}");

@@ -42,7 +42,7 @@ class FixedCollector final : public DiagnosticCollector {
   const Result result_;
 };
 
-// Hangs until it is let go.
+// Blocks until release().
 class HeldCollector final : public DiagnosticCollector {
  public:
   std::string_view fileName() const override { return "held.txt"; }
@@ -57,7 +57,7 @@ class HeldCollector final : public DiagnosticCollector {
     std::unique_lock lock(mutex_);
     return changed_.wait_for(lock, kGenerous, [&] { return entered_ >= times; });
   }
-  void letGo() {
+  void release() {
     const std::lock_guard lock(mutex_);
     isLetGo_ = true;
     changed_.notify_all();
@@ -82,7 +82,7 @@ struct Answer {
 class DiagnosticsStoreTest : public testing::Test {
  protected:
   ~DiagnosticsStoreTest() override {
-    held->letGo();
+    held->release();
     store.reset();
   }
 
@@ -91,7 +91,7 @@ class DiagnosticsStoreTest : public testing::Test {
                                                limits);
   }
 
-  // The completion's answer is awaited by take().
+  // Adds an item; take() waits for its completion.
   std::error_code add(DiagnosticItem item) {
     auto promise = std::make_shared<std::promise<Answer>>();
     std::future<Answer> future = promise->get_future();
@@ -264,7 +264,7 @@ TEST_F(DiagnosticsStoreTest, RefusesItemsBeyondTheQueuesLimitAndLogsItOnce) {
   EXPECT_EQ(add({DiagnosticKind::kWhirlcap}), std::errc::no_buffer_space);
   EXPECT_THAT(lines.textsAt(LogLevel::kError),
               ElementsAre("too many diagnostics at once; requests are refused"));
-  held->letGo();
+  held->release();
   for (int count = 0; count < 3; ++count) EXPECT_FALSE(take().error);
   EXPECT_FALSE(addAndTake({DiagnosticKind::kWhirlcap}).error);
   EXPECT_THAT(lines.textsAt(LogLevel::kError), Contains("diagnostics are taken again; refused meanwhile: 2"));
@@ -308,7 +308,7 @@ TEST_F(DiagnosticsStoreTest, WritesPendingItemsAtTheEndWithoutEvidence) {
   EXPECT_EQ(add({DiagnosticKind::kCapture, "three"}), std::errc::operation_canceled);
 }
 
-// The end once waited for its whole time when there was nothing to wait for.
+// Regression: finish() waited for its whole timeout although no items were pending.
 TEST_F(DiagnosticsStoreTest, EndsAtOnceWhenNothingIsPending) {
   start();
   EXPECT_FALSE(addAndTake({DiagnosticKind::kCapture, "one"}).error);
@@ -317,7 +317,7 @@ TEST_F(DiagnosticsStoreTest, EndsAtOnceWhenNothingIsPending) {
   EXPECT_LT(std::chrono::steady_clock::now() - begin, kGenerous);
 }
 
-// Gives as many bytes as the test wants.
+// Returns as many bytes as the test sets.
 class SizedCollector final : public DiagnosticCollector {
  public:
   explicit SizedCollector(std::size_t count) : bytes(count) {}
@@ -336,7 +336,7 @@ class DiagnosticsBoundsTest : public DiagnosticsStoreTest {
   void set(std::string_view key, const Value& value) {
     preferences.configure(DiagnosticsStore::kPreferenceDomain, key, value);
   }
-  // So that the order is the test's, not the file system's clock's.
+  // Sets the times, so that the order does not depend on the file system's clock.
   void setAge(DiagnosticKind kind, const std::string& name, int seconds) {
     std::filesystem::last_write_time(items.pathOf(kind, name), std::filesystem::file_time_type::clock::now() -
                                                                    std::chrono::seconds(seconds));
@@ -385,7 +385,7 @@ TEST_F(DiagnosticsBoundsTest, AnItemOfTheLargestSizeReplacesAllOthers) {
   set("max_megabytes", 1);
   start();
   ASSERT_FALSE(write(DiagnosticKind::kWhirlcap, "one"));
-  sized->bytes = (1024 - 4 - 4) * kKibibyte;  // the folder and the request take a block each
+  sized->bytes = (1024 - 4 - 4) * kKibibyte;  // the folder and the request need a block each
   ASSERT_FALSE(write(DiagnosticKind::kWhirlcap, "two"));
   EXPECT_THAT(names(DiagnosticKind::kWhirlcap), ElementsAre("two"));
   EXPECT_EQ(bytesOnDisk(), 1024 * kKibibyte);
@@ -407,7 +407,8 @@ TEST_F(DiagnosticsBoundsTest, WithoutPreferencesTheLimitIsAQuarterOfAGigabyte) {
   sized->bytes = 1;
   start();
   ASSERT_FALSE(write(DiagnosticKind::kWhirlcap, "one"));
-  // With what else the two items take, and without writing it.
+  // Fills the limit together with the other files of both items. The file is resized instead of being
+  // written.
   const std::size_t rest = (256 * kKibibyte - 8 - 12) * kKibibyte;
   const std::string large = items.pathOf(DiagnosticKind::kWhirlcap, "one") + "/sized.txt";
   std::filesystem::resize_file(large, rest);

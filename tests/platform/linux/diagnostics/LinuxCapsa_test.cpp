@@ -10,7 +10,7 @@
 #include <optional>
 #include <thread>
 
-#include "platform/Log.h"
+#include "platform/LogCategory.h"
 #include "platform/linux/diagnostics/CapturePolicy.h"
 #include "platform/linux/diagnostics/DiagnosticsStore.h"
 #include "platform/linux/json/NlohmannJsonService.h"
@@ -38,7 +38,7 @@ FaultsignSignature signatureOf(const std::string& type) {
   return {"AudioAnalytics", type, "Error", "IssueDetector", "player", std::nullopt};
 }
 
-// The service over a state directory of its own.
+// Tests the service with a state directory of its own.
 class LinuxCapsaTest : public testing::Test {
  protected:
   struct Answer {
@@ -54,7 +54,7 @@ class LinuxCapsaTest : public testing::Test {
 
   LinuxCapsaTest() { begin(); }
 
-  // The daemon starts again.
+  // Restarts the daemon.
   void begin() {
     end();
     preferences.emplace(directory.path("etc"), directory.path("state/preferences"), category);
@@ -86,7 +86,7 @@ class LinuxCapsaTest : public testing::Test {
     return answer;
   }
 
-  // Folders of captures; those of what was asked for until end().
+  // The folders of captures. After end(), all requested captures have been written.
   std::vector<std::string> folders() const {
     std::vector<std::string> names;
     std::error_code error;
@@ -162,7 +162,7 @@ TEST_F(LinuxCapsaTest, ACancelledCaptureIsNotMade) {
 
 TEST_F(LinuxCapsaTest, AnotherReporterMayCancel) {
   const Answer answer = start(signatureOf("alarms"), 60.0);
-  reporter.reset();  // does not
+  reporter.reset();  // does not cancel it
   capsa->makeReporter()->cancelSession(answer.identifier());
   clock.advance(60.0);
   end();
@@ -207,7 +207,7 @@ TEST_F(LinuxCapsaTest, TheDaysCapturesAreCountedAcrossRestarts) {
   for (int n = 0; n < CapturePolicy::kMaxPerDay; ++n) {
     if (n == 7) begin();
     EXPECT_EQ(start(signatureOf(std::to_string(n)), 1.0).reason(), -1) << n;
-    clock.advance(1.0);  // nothing stays pending
+    clock.advance(1.0);  // so that no capture stays pending
   }
   begin();
   const Answer answer = snapshot(signatureOf("another"));
@@ -288,12 +288,14 @@ TEST_F(LinuxCapsaTest, ConcurrentRequestsDoNotExceedTheDailyLimit) {
   const auto ask = [&](const std::string& name) {
     const auto own = capsa->makeReporter();
     for (int n = 0; n < 15; ++n) {
-      EXPECT_TRUE(own->startSessionWithSignature(signatureOf(name + std::to_string(n)), 3600.0, {}, {}, {},
-                                                 [&](const std::optional<ValueMap>& reply) {
-                                                   if (!reply->boolean(kFaultsignReplySuccess)) return;
-                                                   ++started;
-                                                   own->cancelSession(reply->text(kFaultsignReplySessionID));
-                                                 }));
+      const bool isAccepted =
+          own->startSessionWithSignature(signatureOf(name + std::to_string(n)), 3600.0, {}, {}, {},
+                                         [&](const std::optional<ValueMap>& reply) {
+                                           if (!reply->boolean(kFaultsignReplySuccess)) return;
+                                           ++started;
+                                           own->cancelSession(reply->text(kFaultsignReplySessionID));
+                                         });
+      EXPECT_TRUE(isAccepted);
     }
   };
   std::thread one([&] { ask("one"); });

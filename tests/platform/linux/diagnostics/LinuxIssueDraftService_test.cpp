@@ -43,10 +43,10 @@ class GraphCollector final : public DiagnosticCollector {
   Result collect() override { return {"[]", ""}; }
 };
 
-// Both services on a real store.
+// Tests both services with a real store.
 class DiagnosticServicesTest : public testing::Test {
  protected:
-  // What the handler got; "-" when it was not called.
+  // The handler's argument; "-" if it was not called.
   std::optional<std::string> create(TrackletDraft tracklet, std::optional<std::string> process) {
     auto promise = std::make_shared<std::promise<std::optional<std::string>>>();
     auto answer = promise->get_future();
@@ -162,7 +162,7 @@ TEST_F(DiagnosticServicesTest, TooManyStallTracesAreLimitedAndLoggedOnce) {
   for (int count = 0; count < 2000; ++count) whirlcaps.request("r", "s", "", {}, {true, true});
   store.finish(30s);
   EXPECT_LE(items.listAll().size(), 5u);
-  // Said when it begins and when it is over, by the store: nothing of single requests.
+  // The store logs the beginning and the end, but not each request.
   const std::vector<std::string> errors = lines.textsAt(LogLevel::kError);
   EXPECT_THAT(errors, Contains("too many diagnostics at once; requests are refused"));
   EXPECT_THAT(errors, Each(AnyOf("too many diagnostics at once; requests are refused",

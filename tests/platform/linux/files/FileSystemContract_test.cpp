@@ -58,7 +58,7 @@ struct InMemory {
   void addSymbolicLink(const std::string& path) { files.addSymbolicLink(path); }
 };
 
-// What every file system does.
+// The contract of all file systems.
 template <typename Kind>
 class FileSystemContract : public testing::Test {
  protected:
@@ -67,7 +67,7 @@ class FileSystemContract : public testing::Test {
   std::unique_ptr<NewFile> create(const std::string& name) {
     return kind_.files.createFile(path("d"), name, error_);
   }
-  // A whole file with this text.
+  // Writes a complete file with this text.
   void add(const std::string& name, const std::string& text) {
     const auto file = create(name);
     ASSERT_NE(file, nullptr) << error_.message();
@@ -171,7 +171,7 @@ TYPED_TEST(FileSystemContract, DirectoriesGetExactlyTheirMode) {
   EXPECT_FALSE(this->kind_.files.createDirectories(this->path("a/b/c"), 0777));
   for (const char* name : {"a", "a/b", "a/b/c"})
     EXPECT_EQ(this->kind_.modeOf(this->path(name)), 0777U) << name;
-  // Those that were there keep theirs.
+  // Existing directories keep their modes.
   EXPECT_FALSE(this->kind_.files.createDirectories(this->path("a/b/d"), 0700));
   EXPECT_EQ(this->kind_.modeOf(this->path("a/b")), 0777U);
   EXPECT_EQ(this->kind_.modeOf(this->path("a/b/d")), 0700U);
@@ -272,7 +272,7 @@ TEST(LinuxFileSystemTest, AMoveToWhereNoFileCanBeMadeLeavesTheFile) {
   const TemporaryDirectory directory;
   std::ofstream(directory.path("from")) << "text";
   LinuxFileSystem files;
-  // No regular file can be made there, whoever asks.
+  // Not even root can create a regular file there.
   EXPECT_TRUE(files.moveFile(directory.path("from"), "/proc/self", "to"));
   EXPECT_EQ(OnDisk::contents(directory.path("from")), "text");
 }
@@ -285,7 +285,7 @@ TEST(LinuxFileSystemTest, APipeInTheFilesPlaceNeitherBlocksNorIsWritten) {
   EXPECT_EQ(error, std::errc::file_exists);
 }
 
-// The names in a directory, hidden ones included.
+// The names in a directory, including hidden ones.
 std::vector<std::string> namesIn(const std::string& directory) {
   std::vector<std::string> names;
   for (const auto& entry : std::filesystem::directory_iterator(directory)) {
@@ -306,7 +306,7 @@ TEST(LinuxFileSystemTest, AFileThatIsBeingWrittenIsHiddenAndGoesWithItsWriter) {
   EXPECT_THAT(namesIn(directory.path()), IsEmpty());
 }
 
-// A process that writes a file and is killed.
+// Runs a process that writes a file and is killed.
 void beKilledWhileWriting(const std::string& directory) {
   const pid_t child = fork();
   if (child == 0) {
@@ -386,7 +386,7 @@ TEST(MemoryFileSystemTest, FailsOnDemand) {
     EXPECT_FALSE(file->write("a"));
     EXPECT_EQ(file->write("b"), std::errc::no_space_on_device);
     EXPECT_FALSE(file->write("c"));
-    EXPECT_EQ(file->place("x"), std::errc::no_space_on_device);  // not whole
+    EXPECT_EQ(file->place("x"), std::errc::no_space_on_device);  // the file is incomplete
     EXPECT_EQ(files.openFiles(), 1);
   }
   EXPECT_EQ(files.openFiles(), 0);
@@ -412,15 +412,15 @@ TEST(LinuxFileSystemTest, AFileIsNotPlacedOnAFullDisk) {
   EXPECT_THAT(namesIn(directory.path()), IsEmpty());
 }
 
-// Something that comes between the file system and the kernel.
+// Intercepts system calls of the file system.
 class LinuxFileSystemCallTest : public testing::Test {
  protected:
   void SetUp() override {
     const bool isPossible = runIntercepted(SYS_flock, nullptr, [] {});
     if (!isPossible) GTEST_SKIP() << "system calls cannot be intercepted here";
   }
-  // Makes a.json with the text "text", while `handle` is asked about each of the calls of `number`. What
-  // fails is in `error`.
+  // Writes a.json with the text "text". `handle` decides about each system call `number`. Sets `error` if
+  // writing fails.
   void write(long number, const InterceptedCallHandler& handle) {
     ASSERT_TRUE(runIntercepted(number, handle, [this] {
       LinuxFileSystem files;
@@ -429,7 +429,7 @@ class LinuxFileSystemCallTest : public testing::Test {
       if (file != nullptr && !error) error = file->place("a.json");
     }));
   }
-  // Of the only file in the directory; none when another has it.
+  // Locks the only file in the directory; none if another process has locked it.
   FileDescriptor lockOnlyFile() const {
     const std::vector<std::string> names = namesIn(directory.path());
     EXPECT_EQ(names.size(), 1U);
@@ -439,21 +439,21 @@ class LinuxFileSystemCallTest : public testing::Test {
     return file;
   }
 
-  // More often than this no call is made to fail, so that no defect makes a test endless.
+  // The largest number of calls that fail, so that a defect cannot make a test endless.
   static constexpr int kMaxCalls = 100;
   TemporaryDirectory directory;
   std::error_code error;
   int calls = 0;
 };
 
-// Once it made files without end where none can be locked.
+// Regression: it created files without end on a file system without locks.
 TEST_F(LinuxFileSystemCallTest, WritesWithoutLocksAndKeepsLeftovers) {
   std::ofstream(directory.path(".new-1")) << "left";
   for (const int failure : {ENOLCK, EOPNOTSUPP}) {
     calls = 0;
     write(SYS_flock, [&](const seccomp_data&) { return ++calls <= kMaxCalls ? failure : 0; });
     EXPECT_FALSE(error) << error.message();
-    EXPECT_EQ(calls, 2);  // the leftover's and the file's
+    EXPECT_EQ(calls, 2);  // for the leftover and for the file
     EXPECT_THAT(namesIn(directory.path()), ElementsAre(".new-1", "a.json"));
     EXPECT_EQ(OnDisk::contents(directory.path("a.json")), "text");
     std::filesystem::remove(directory.path("a.json"));
@@ -489,7 +489,7 @@ TEST_F(LinuxFileSystemCallTest, GivesUpIfEveryNewFileIsLockedByAnotherProcess) {
   EXPECT_THAT(namesIn(directory.path()), IsEmpty());
 }
 
-// Else another process may lock it in between, and writes into a file that is gone.
+// Otherwise another process could lock the leftover just before it is removed, and write to a removed file.
 TEST_F(LinuxFileSystemCallTest, ALeftoverIsLockedUntilItIsRemoved) {
   std::ofstream(directory.path(".new-1")) << "left";
   write(SYS_unlinkat, [&](const seccomp_data&) {
@@ -502,7 +502,7 @@ TEST_F(LinuxFileSystemCallTest, ALeftoverIsLockedUntilItIsRemoved) {
   EXPECT_THAT(namesIn(directory.path()), ElementsAre("a.json"));
 }
 
-// Else a crash of the system may take the name away again, though the text is on the disk.
+// Otherwise a crash of the system could lose the name although the text is on the disk.
 TEST_F(LinuxFileSystemCallTest, AFailedSyncOfTheDirectoryIsAFailure) {
   write(SYS_fsync, [&](const seccomp_data& call) {
     const std::string file = "/proc/self/fd/" + std::to_string(call.args[0]);
@@ -516,7 +516,7 @@ TEST_F(LinuxFileSystemCallTest, AFailedSyncOfTheDirectoryIsAFailure) {
   EXPECT_EQ(OnDisk::contents(directory.path("a.json")), "text");
 }
 
-// Some file systems rename only over what stands there.
+// Some file systems cannot rename without replacing.
 TEST_F(LinuxFileSystemCallTest, AFileIsPlacedWithALinkIfARenameWouldReplace) {
   write(SYS_renameat2, [&](const seccomp_data&) {
     ++calls;

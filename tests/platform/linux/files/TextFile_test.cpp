@@ -12,7 +12,7 @@
 namespace tonewerk {
 namespace {
 
-// A pipe takes no more at once than fits into it.
+// One write to a pipe accepts only as many bytes as fit into it.
 TEST(WriteAllTest, WritesAllTextInSeveralCalls) {
   int ends[2] = {-1, -1};
   ASSERT_EQ(pipe2(ends, O_CLOEXEC), 0);

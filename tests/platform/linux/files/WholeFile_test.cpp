@@ -50,7 +50,7 @@ TEST_F(WholeFileTest, DoesNotBlockOnOtherThanRegularFiles) {
   EXPECT_EQ(read(), std::errc::too_many_symbolic_link_levels);
 }
 
-// The kernel's own files are never as large as they say: to a reader they grow under its hands.
+// The size that stat() reports for the kernel's files is wrong, so they seem to grow while they are read.
 TEST_F(WholeFileTest, GivesUpOnAFileThatChangesAtEveryRead) {
   EXPECT_EQ(readWholeFile("/proc/self/stat", kMax, text_, stamp_), std::errc::resource_unavailable_try_again);
 }

@@ -108,7 +108,7 @@ TEST_F(JsonBenchfileTest, AnAbandonedWriterLeavesNoFile) {
   EXPECT_FALSE(std::filesystem::exists(directory_.path("data.bdj")));
 }
 
-// The size limit stands for a full disk.
+// The limit of the file size simulates a full disk.
 TEST_F(JsonBenchfileTest, AFullDiskShowsAtTheEndAndLeavesNoFile) {
   rlimit before{};
   ASSERT_EQ(getrlimit(RLIMIT_FSIZE, &before), 0);

@@ -12,7 +12,7 @@ namespace {
 
 constexpr double kNaN = std::numeric_limits<double>::quiet_NaN();
 
-// What every JSON service does.
+// The contract of all JSON services.
 template <typename Service>
 class JsonServiceContract : public testing::Test {
  protected:
@@ -117,7 +117,7 @@ RC_GTEST_PROP(NlohmannJsonServiceTest, PrettyAndCompactTextSayTheSame, ()) {
   std::string problem;
   const auto pretty = service.pretty(map, problem);
   const auto compact = service.parse(service.compact(map), problem);
-  RC_ASSERT(pretty.has_value() == compact.has_value());  // neither when something is NaN or infinite
+  RC_ASSERT(pretty.has_value() == compact.has_value());  // both fail if a number is NaN or infinite
   if (pretty) RC_ASSERT(service.parse(*pretty, problem) == compact);
 }
 

@@ -20,7 +20,7 @@ using ::testing::ElementsAre;
 using ::testing::HasSubstr;
 using ::testing::IsEmpty;
 
-// The library's own tree of what is below `node`.
+// Converts the tree below `node` into the library's own tree.
 Json asJson(const JsonTree& tree, const Node& node) {
   switch (node.kind) {
     case Kind::kNull:

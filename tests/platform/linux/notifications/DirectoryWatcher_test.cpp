@@ -14,7 +14,7 @@
 #include <unistd.h>
 #include <vector>
 
-#include "support/OtherUser.h"
+#include "support/Stranger.h"
 #include "support/TemporaryDirectory.h"
 #include "support/memory/MemoryLog.h"
 
@@ -25,49 +25,49 @@ namespace fs = std::filesystem;
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
-constexpr std::chrono::seconds kPatience{20};
+constexpr std::chrono::seconds kTimeout{20};
 constexpr char kEverything[] = "*";
 
 class DirectoryWatcherTest : public ::testing::Test {
  protected:
   void watch() {
     watcher = std::make_unique<DirectoryWatcher>(
-        watched, [this](std::string_view name) { tell(std::string(name)); }, [this] { tell(kEverything); },
-        category);
+        watched, [this](std::string_view name) { report(std::string(name)); },
+        [this] { report(kEverything); }, category);
   }
   std::string path(const std::string& name) const { return watched + "/" + name; }
   static void write(const std::string& path, const std::string& text = "1\n") { std::ofstream(path) << text; }
 
-  void tell(const std::string& what) {
+  void report(const std::string& what) {
     {
       std::unique_lock lock(mutex);
-      told.push_back(what);
+      reports.push_back(what);
       all.push_back(what);
       isHeld.wait(lock, [this] { return !mustHold; });
     }
     changed.notify_all();
   }
-  // Waits until it was told of this, and forgets what was told up to there.
-  bool waitFor(const std::string& what, std::chrono::milliseconds patience = kPatience) {
+  // Waits until the watcher has reported this, and drops all reports up to it.
+  bool waitFor(const std::string& what, std::chrono::milliseconds timeout = kTimeout) {
     std::unique_lock lock(mutex);
-    return changed.wait_for(lock, patience, [&] {
-      const auto found = std::find(told.begin(), told.end(), what);
-      if (found == told.end()) return false;
-      before.assign(told.begin(), found);
-      told.erase(told.begin(), found + 1);
+    return changed.wait_for(lock, timeout, [&] {
+      const auto found = std::find(reports.begin(), reports.end(), what);
+      if (found == reports.end()) return false;
+      before.assign(reports.begin(), found);
+      reports.erase(reports.begin(), found + 1);
       return true;
     });
   }
-  // A file that is there but once.
-  std::string newWitness() { return "witness" + std::to_string(++witnesses); }
-  // What was told before a witness that is written now.
-  std::vector<std::string> toldSoFar() {
-    const std::string witness = newWitness();
-    write(path(witness));
-    EXPECT_TRUE(waitFor(witness));
+  // Makes a file name that is used only once.
+  std::string newMarkerName() { return "witness" + std::to_string(++markers); }
+  // Writes a marker file, and returns the reports before the marker's.
+  std::vector<std::string> reportsSoFar() {
+    const std::string marker = newMarkerName();
+    write(path(marker));
+    EXPECT_TRUE(waitFor(marker));
     return before;
   }
-  // Keeps the watcher in its handler: what happens until release() gathers in the kernel.
+  // Keeps the watcher in its handler, so that the kernel queues all events until release().
   void hold() {
     {
       const std::lock_guard lock(mutex);
@@ -83,16 +83,16 @@ class DirectoryWatcherTest : public ::testing::Test {
     isHeld.notify_all();
     EXPECT_TRUE(waitFor("gate"));
   }
-  bool wasEverTold(const std::string& what) {
+  bool wasEverReported(const std::string& what) {
     const std::lock_guard lock(mutex);
     return std::find(all.begin(), all.end(), what) != all.end();
   }
-  // Whether files are told of again. The first may fall into the time when everything is.
-  bool isFollowed() {
+  // Whether files are reported again. The first one may be part of a report of everything.
+  bool isWatched() {
     for (int attempt = 0; attempt < 400; ++attempt) {
-      const std::string witness = newWitness();
-      write(path(witness));
-      if (waitFor(witness, std::chrono::milliseconds(50))) return true;
+      const std::string marker = newMarkerName();
+      write(path(marker));
+      if (waitFor(marker, std::chrono::milliseconds(50))) return true;
     }
     return false;
   }
@@ -105,11 +105,11 @@ class DirectoryWatcherTest : public ::testing::Test {
   std::mutex mutex;
   std::condition_variable changed;
   std::condition_variable isHeld;
-  std::vector<std::string> told;    // under the mutex, as the next two
-  std::vector<std::string> all;     // never forgotten
-  bool mustHold = false;            // keeps the watcher in its handler
-  std::vector<std::string> before;  // what waitFor() skipped
-  int witnesses = 0;
+  std::vector<std::string> reports;  // under the mutex, as the next two
+  std::vector<std::string> all;      // all reports, never dropped
+  bool mustHold = false;             // keeps the watcher in its handler
+  std::vector<std::string> before;   // the reports that waitFor() dropped
+  int markers = 0;
   std::unique_ptr<DirectoryWatcher> watcher;
 };
 
@@ -124,14 +124,14 @@ class WatchedDirectoryTest : public DirectoryWatcherTest {
 TEST_F(WatchedDirectoryTest, AFileThatIsRewrittenIsReported) {
   write(path("a"));
   EXPECT_TRUE(waitFor("a"));
-  toldSoFar();
+  reportsSoFar();
   write(path("a"));
   EXPECT_TRUE(waitFor("a"));
 }
 
 TEST_F(WatchedDirectoryTest, AFileThatIsOpenedForWritingAndClosedIsReported) {
   write(path("a"));
-  toldSoFar();
+  reportsSoFar();
   std::ofstream(path("a"), std::ios::app).close();
   EXPECT_TRUE(waitFor("a"));
 }
@@ -140,7 +140,7 @@ TEST_F(WatchedDirectoryTest, AFileThatIsRenamedIntoPlaceIsReported) {
   write(root.path("made"));
   fs::rename(root.path("made"), path("a"));
   EXPECT_TRUE(waitFor("a"));
-  toldSoFar();
+  reportsSoFar();
   write(root.path("made"));
   fs::rename(root.path("made"), path("a"));  // over the old one
   EXPECT_TRUE(waitFor("a"));
@@ -155,17 +155,17 @@ TEST_F(WatchedDirectoryTest, AFileThatIsLinkedIntoPlaceIsReported) {
 TEST_F(WatchedDirectoryTest, AFileThatIsOnlyCreatedIsNotReported) {
   std::ofstream file(path("a"));
   ASSERT_TRUE(file.is_open());
-  EXPECT_THAT(toldSoFar(), IsEmpty());
+  EXPECT_THAT(reportsSoFar(), IsEmpty());
   file.close();
   EXPECT_TRUE(waitFor("a"));
 }
 
-// Once told of twice, when its creation was read only after it had been written to.
+// Regression: it was reported twice if its creation event was read only after it was written to.
 TEST_F(WatchedDirectoryTest, AFileThatIsCreatedAndWrittenAtOnceIsReportedOnce) {
   hold();
   write(path("a"));
   release();
-  EXPECT_THAT(toldSoFar(), ElementsAre("a"));
+  EXPECT_THAT(reportsSoFar(), ElementsAre("a"));
 }
 
 TEST_F(WatchedDirectoryTest, ANewFileIsNotReportedBeforeItsWriterClosesIt) {
@@ -173,11 +173,11 @@ TEST_F(WatchedDirectoryTest, ANewFileIsNotReportedBeforeItsWriterClosesIt) {
   std::ofstream file(path("a"));
   file << "1\n" << std::flush;
   release();
-  EXPECT_THAT(toldSoFar(), IsEmpty());
+  EXPECT_THAT(reportsSoFar(), IsEmpty());
   file << "2\n";
   file.close();
   EXPECT_TRUE(waitFor("a"));
-  EXPECT_THAT(toldSoFar(), IsEmpty());
+  EXPECT_THAT(reportsSoFar(), IsEmpty());
 }
 
 TEST_F(WatchedDirectoryTest, AFileThatIsReadWhileItIsWrittenIsReportedOnce) {
@@ -191,7 +191,7 @@ TEST_F(WatchedDirectoryTest, AFileThatIsReadWhileItIsWrittenIsReportedOnce) {
   }
   read();
   release();
-  EXPECT_THAT(toldSoFar(), ElementsAre("a"));
+  EXPECT_THAT(reportsSoFar(), ElementsAre("a"));
 }
 
 TEST_F(WatchedDirectoryTest, EachWriteToANewFileIsReported) {
@@ -200,7 +200,7 @@ TEST_F(WatchedDirectoryTest, EachWriteToANewFileIsReported) {
   write(path("b"));
   write(path("a"));
   release();
-  EXPECT_THAT(toldSoFar(), ElementsAre("a", "b", "a"));
+  EXPECT_THAT(reportsSoFar(), ElementsAre("a", "b", "a"));
 }
 
 TEST_F(WatchedDirectoryTest, ALinkIsReportedOnceHoweverLateItsEventIsRead) {
@@ -210,7 +210,7 @@ TEST_F(WatchedDirectoryTest, ALinkIsReportedOnceHoweverLateItsEventIsRead) {
   fs::remove(root.path("made"));
   release();
   EXPECT_TRUE(waitFor("a"));
-  EXPECT_THAT(toldSoFar(), IsEmpty());
+  EXPECT_THAT(reportsSoFar(), IsEmpty());
 }
 
 TEST_F(WatchedDirectoryTest, ALinkThatIsReadIsReportedOnce) {
@@ -221,7 +221,7 @@ TEST_F(WatchedDirectoryTest, ALinkThatIsReadIsReportedOnce) {
   EXPECT_EQ(std::ifstream(path("a")).get(), '1');
   release();
   EXPECT_TRUE(waitFor("a"));
-  EXPECT_THAT(toldSoFar(), IsEmpty());
+  EXPECT_THAT(reportsSoFar(), IsEmpty());
 }
 
 TEST_F(WatchedDirectoryTest, ALinkThatIsOpenForReadingIsReportedWhenItIsClosed) {
@@ -231,7 +231,7 @@ TEST_F(WatchedDirectoryTest, ALinkThatIsOpenForReadingIsReportedWhenItIsClosed) 
   std::ifstream file(path("a"));
   ASSERT_TRUE(file.is_open());
   release();
-  EXPECT_THAT(toldSoFar(), IsEmpty());
+  EXPECT_THAT(reportsSoFar(), IsEmpty());
   file.close();
   EXPECT_TRUE(waitFor("a"));
 }
@@ -243,9 +243,9 @@ TEST_F(WatchedDirectoryTest, ALinkThatIsWrittenToIsReportedOnceAfterTheWrite) {
   std::ofstream file(path("a"), std::ios::app);
   file << "2\n" << std::flush;
   release();
-  EXPECT_THAT(toldSoFar(), IsEmpty());
+  EXPECT_THAT(reportsSoFar(), IsEmpty());
   file.close();
-  EXPECT_THAT(toldSoFar(), ElementsAre("a"));
+  EXPECT_THAT(reportsSoFar(), ElementsAre("a"));
 }
 
 TEST_F(WatchedDirectoryTest, AFileThatIsGoneWhenItsEventIsReadIsNotReported) {
@@ -254,25 +254,25 @@ TEST_F(WatchedDirectoryTest, AFileThatIsGoneWhenItsEventIsReadIsNotReported) {
   fs::create_hard_link(root.path("made"), path("a"));
   fs::remove(path("a"));
   release();
-  EXPECT_THAT(toldSoFar(), IsEmpty());
+  EXPECT_THAT(reportsSoFar(), IsEmpty());
 }
 
 TEST_F(WatchedDirectoryTest, ReadingRemovingAndMovingAwayAreNotReported) {
   write(path("a"));
   write(path("b"));
-  toldSoFar();
+  reportsSoFar();
   std::string text;
   std::getline(std::ifstream(path("a")), text);
   EXPECT_EQ(text, "1");
   fs::remove(path("a"));
   fs::rename(path("b"), root.path("b"));
-  EXPECT_THAT(toldSoFar(), IsEmpty());
+  EXPECT_THAT(reportsSoFar(), IsEmpty());
 }
 
 TEST_F(WatchedDirectoryTest, ARemovedFileIsReportedWhenItIsCreatedAgain) {
   write(path("a"));
   EXPECT_TRUE(waitFor("a"));
-  toldSoFar();
+  reportsSoFar();
   fs::remove(path("a"));
   write(path("a"));
   EXPECT_TRUE(waitFor("a"));
@@ -283,21 +283,21 @@ TEST_F(WatchedDirectoryTest, OnlyRegularFilesAreReported) {
   fs::create_directory(root.path("other"));
   fs::rename(root.path("other"), path("other"));
   fs::create_symlink(root.path("nowhere"), path("link"));
-  EXPECT_THAT(toldSoFar(), IsEmpty());
+  EXPECT_THAT(reportsSoFar(), IsEmpty());
 }
 
 TEST_F(WatchedDirectoryTest, ChangesOutsideTheDirectoryAreNotReported) {
   write(parent + "/reporting.sock");
   write(parent + "/watched2");
   fs::create_directory(parent + "/channels");
-  EXPECT_THAT(toldSoFar(), IsEmpty());
+  EXPECT_THAT(reportsSoFar(), IsEmpty());
 }
 
-// It is one event of the directory above, and queued every handler though nothing was posted.
+// Regression: the event of the directory above queued every handler although nothing was posted.
 TEST_F(WatchedDirectoryTest, AChangedModeOfAWatchedDirectoryReportsNothing) {
   fs::permissions(watched, fs::perms::owner_all);
   fs::last_write_time(watched, fs::file_time_type::clock::now());
-  EXPECT_THAT(toldSoFar(), IsEmpty());
+  EXPECT_THAT(reportsSoFar(), IsEmpty());
 }
 
 TEST_F(WatchedDirectoryTest, ADirectoryThatIsRemovedAndCreatedAgainIsWatched) {
@@ -305,7 +305,7 @@ TEST_F(WatchedDirectoryTest, ADirectoryThatIsRemovedAndCreatedAgainIsWatched) {
     fs::remove_all(watched);
     EXPECT_TRUE(waitFor(kEverything));
     fs::create_directory(watched);
-    EXPECT_TRUE(isFollowed());
+    EXPECT_TRUE(isWatched());
   }
 }
 
@@ -314,8 +314,8 @@ TEST_F(WatchedDirectoryTest, AfterADirectoryIsMovedAwayTheNewOneIsWatched) {
   EXPECT_TRUE(waitFor(kEverything));
   write(root.path("away/old"));
   fs::create_directory(watched);
-  EXPECT_TRUE(isFollowed());
-  EXPECT_FALSE(wasEverTold("old"));
+  EXPECT_TRUE(isWatched());
+  EXPECT_FALSE(wasEverReported("old"));
 }
 
 TEST_F(WatchedDirectoryTest, AReplacedDirectoryIsNoLongerWatched) {
@@ -323,14 +323,14 @@ TEST_F(WatchedDirectoryTest, AReplacedDirectoryIsNoLongerWatched) {
   write(parent + "/next/a");
   fs::rename(parent + "/next", watched);
   EXPECT_TRUE(waitFor(kEverything));
-  EXPECT_TRUE(isFollowed());
+  EXPECT_TRUE(isWatched());
 }
 
 TEST_F(WatchedDirectoryTest, AParentThatIsRemovedAndCreatedAgainIsFound) {
   fs::remove_all(parent);
   EXPECT_TRUE(waitFor(kEverything));
   fs::create_directories(watched);
-  EXPECT_TRUE(isFollowed());
+  EXPECT_TRUE(isWatched());
 }
 
 TEST_F(WatchedDirectoryTest, AParentThatIsMovedAwayIsNoLongerWatched) {
@@ -338,8 +338,8 @@ TEST_F(WatchedDirectoryTest, AParentThatIsMovedAwayIsNoLongerWatched) {
   EXPECT_TRUE(waitFor(kEverything));
   write(root.path("away/watched/old"));
   fs::create_directories(watched);
-  EXPECT_TRUE(isFollowed());
-  EXPECT_FALSE(wasEverTold("old"));
+  EXPECT_TRUE(isWatched());
+  EXPECT_FALSE(wasEverReported("old"));
 }
 
 TEST_F(WatchedDirectoryTest, AnOverflowOfTheEventQueueReportsEverything) {
@@ -347,7 +347,7 @@ TEST_F(WatchedDirectoryTest, AnOverflowOfTheEventQueueReportsEverything) {
   std::ifstream("/proc/sys/fs/inotify/max_queued_events") >> most;
   if (most == 0 || most > 200'000) GTEST_SKIP() << "events that fit: " << most;
   hold();
-  // Two names in turn, since the kernel joins equal events that follow each other.
+  // Two names in turn, because the kernel merges consecutive equal events.
   for (std::size_t count = 0; count <= most / 2 + 1000; ++count) {
     std::ofstream(path("a"), std::ios::app).close();
     std::ofstream(path("b"), std::ios::app).close();
@@ -374,8 +374,8 @@ TEST_F(DirectoryWatcherTest, TheDirectoryMayBeCreatedWithItsParent) {
   watch();
   fs::create_directories(watched);
   EXPECT_TRUE(waitFor(kEverything));
-  // Everything is told again where the watcher saw the parent before the directory.
-  EXPECT_TRUE(isFollowed());
+  // Everything is reported again if the watcher noticed the parent before the directory.
+  EXPECT_TRUE(isWatched());
 }
 
 TEST_F(DirectoryWatcherTest, TheDirectoryMayBeCreatedLevelByLevelWithPauses) {
@@ -383,11 +383,11 @@ TEST_F(DirectoryWatcherTest, TheDirectoryMayBeCreatedLevelByLevelWithPauses) {
   watch();
   for (const char* level : {"a", "a/b", "a/b/c"}) {
     fs::create_directory(root.path(level));
-    // Told of when the watcher has gone down to it.
+    // Reported when the watcher has reached this level.
     EXPECT_TRUE(waitFor(kEverything)) << level;
   }
   fs::create_directory(watched);
-  EXPECT_TRUE(isFollowed());
+  EXPECT_TRUE(isWatched());
   EXPECT_THAT(log.lines(), IsEmpty());
 }
 
@@ -399,7 +399,7 @@ TEST_F(DirectoryWatcherTest, AllDirectoriesAboveMayBeRemovedAndCreatedAgain) {
     fs::remove_all(root.path("a"));
     EXPECT_TRUE(waitFor(kEverything));
     fs::create_directories(watched);
-    EXPECT_TRUE(isFollowed());
+    EXPECT_TRUE(isWatched());
   }
 }
 
@@ -409,7 +409,7 @@ TEST_F(DirectoryWatcherTest, WaitsWhileAFileIsInTheDirectorysPlace) {
   watch();
   fs::remove(watched);
   fs::create_directory(watched);
-  EXPECT_TRUE(isFollowed());
+  EXPECT_TRUE(isWatched());
 }
 
 TEST_F(DirectoryWatcherTest, AnUnreadableDirectoryIsLoggedOnce) {
@@ -429,7 +429,7 @@ TEST_F(DirectoryWatcherTest, ADirectoryThatBecomesReadableIsWatched) {
   fs::permissions(root.path(), kEverybodys);
   fs::permissions(parent, kEverybodys);
   fs::permissions(watched, fs::perms::owner_all);
-  runAsOtherUser([this] { watch(); });  // the watcher's thread is one, too
+  runAsOtherUser([this] { watch(); });  // the watcher's thread has the same user
   fs::permissions(watched, kEverybodys);
   EXPECT_TRUE(waitFor(kEverything));
   write(path("a"));

@@ -21,14 +21,14 @@ using Token = NotificationService::Token;
 
 constexpr char kName[] = "com.orvane.test.changed";
 
-// The service as processes see it that know no more than its files.
+// Tests the service from the view of processes that know only its files.
 class InotifyNotificationServiceTest : public ::testing::Test {
  protected:
   Token registerName(const std::string& name) {
     const auto registration = service.registerHandler(name, queue, [this](Token token) {
       {
         const std::lock_guard lock(mutex);
-        ++told[token];
+        ++calls[token];
       }
       changed.notify_all();
     });
@@ -37,11 +37,11 @@ class InotifyNotificationServiceTest : public ::testing::Test {
   }
   int count(Token token) {
     const std::lock_guard lock(mutex);
-    return told[token];
+    return calls[token];
   }
   bool waitForMoreThan(int before, Token token) {
     std::unique_lock lock(mutex);
-    return changed.wait_for(lock, std::chrono::seconds(20), [&] { return told[token] > before; });
+    return changed.wait_for(lock, std::chrono::seconds(20), [&] { return calls[token] > before; });
   }
   std::string file(const std::string& name = kName) const { return notifications + "/" + name; }
 
@@ -51,7 +51,7 @@ class InotifyNotificationServiceTest : public ::testing::Test {
   LogCategory category{log, "com.orvane.tonewerk", "twrs"};
   std::mutex mutex;
   std::condition_variable changed;
-  std::map<Token, int> told;  // under the mutex
+  std::map<Token, int> calls;  // under the mutex
   ThreadQueue queue{"test", QueuePriority::kUtility};
   InotifyNotificationService service{notifications, category};
 };
@@ -103,7 +103,7 @@ TEST_F(InotifyNotificationServiceTest, EveryHandlerIsCalledWhenTheDirectoryIsRep
   EXPECT_TRUE(waitForMoreThan(0, first));
   EXPECT_TRUE(waitForMoreThan(0, second));
   const int before = count(first);
-  EXPECT_FALSE(service.post(kName));  // makes the directory anew
+  EXPECT_FALSE(service.post(kName));  // creates the directory again
   EXPECT_TRUE(waitForMoreThan(before, first));
   EXPECT_EQ(service.state(first), 0U);
 }

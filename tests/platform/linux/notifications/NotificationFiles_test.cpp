@@ -24,7 +24,7 @@ class NotificationFilesTest : public ::testing::Test {
     std::filesystem::create_directories(files.directory());
     std::ofstream(files.directory() + "/" + name) << text;
   }
-  // The state, or what is wrong with it.
+  // The state, or the problem of reading it.
   std::optional<std::uint64_t> state(const std::string& name) { return files.state(name, error); }
   std::vector<std::string> names() const {
     std::vector<std::string> found;
@@ -107,7 +107,7 @@ TEST_F(NotificationFilesTest, ALinkDoesNotLeadOutOfTheDirectory) {
   EXPECT_EQ(state("a"), std::nullopt);
   EXPECT_EQ(error, std::errc::too_many_symbolic_link_levels);
   EXPECT_EQ(files.post("a"), std::errc::too_many_symbolic_link_levels);
-  EXPECT_FALSE(files.post("a", 1));  // takes the link's place
+  EXPECT_FALSE(files.post("a", 1));  // replaces the link
   EXPECT_EQ(state("a"), 1U);
   std::string outside;
   std::getline(std::ifstream(directory.path("outside")), outside);

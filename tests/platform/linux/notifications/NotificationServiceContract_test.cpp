@@ -1,12 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <chrono>
 #include <condition_variable>
+#include <functional>
 #include <future>
 #include <gtest/gtest.h>
 #include <limits>
 #include <memory>
 #include <mutex>
 #include <string>
+#include <utility>
 
 #include "platform/linux/notifications/InotifyNotificationService.h"
 #include "platform/linux/notifications/NotificationFiles.h"
@@ -22,7 +24,7 @@ using Token = NotificationService::Token;
 
 constexpr char kName[] = "com.orvane.test.changed";
 constexpr char kOther[] = "com.orvane.test.other";
-constexpr std::chrono::seconds kPatience{20};
+constexpr std::chrono::seconds kTimeout{20};
 
 struct OnFiles {
   TemporaryDirectory directory;
@@ -41,14 +43,14 @@ struct InMemory {
   std::error_code post(std::string_view name, std::uint64_t state) { return service.post(name, state); }
 };
 
-// What every notification service does.
+// The contract of all notification services.
 template <typename Kind>
 class NotificationServiceContract : public testing::Test {
  protected:
   NotificationService& service() { return kind_.service; }
   std::error_code post(std::string_view name, std::uint64_t state) { return kind_.post(name, state); }
 
-  // Called from handlers: changes what the test waits for.
+  // Handlers call this to change a value that the test waits for.
   template <typename Change>
   void change(Change change) {
     {
@@ -61,10 +63,11 @@ class NotificationServiceContract : public testing::Test {
   template <typename Condition>
   bool waitUntil(Condition condition) {
     std::unique_lock lock(mutex_);
-    return changed_.wait_for(lock, kPatience, condition);
+    return changed_.wait_for(lock, kTimeout, condition);
   }
 
-  // How often a handler was told. Handlers share it, since they may run on when the test's body has ended.
+  // Counts a handler's calls. Handlers share ownership, because they may still run after the test's body has
+  // ended.
   using Count = std::shared_ptr<int>;
   static Count newCount() { return std::make_shared<int>(0); }
   void increase(const Count& count) {
@@ -75,45 +78,51 @@ class NotificationServiceContract : public testing::Test {
     return *count;
   }
 
+  // Registers a handler on the test's queue.
+  void addHandler(std::string_view name, std::function<void(Token)> handler) {
+    const auto registration = service().registerHandler(name, queue_, std::move(handler));
+    EXPECT_EQ(registration.status, NotificationService::kStatusOk);
+  }
   // Registers a handler that counts.
-  Token count(std::string_view name, const Count& told, SerialQueue& queue) {
-    const auto registration = service().registerHandler(name, queue, [this, told](Token) { increase(told); });
+  Token count(std::string_view name, const Count& calls, SerialQueue& queue) {
+    const auto registration =
+        service().registerHandler(name, queue, [this, calls](Token) { increase(calls); });
     EXPECT_EQ(registration.status, NotificationService::kStatusOk);
     return registration.token;
   }
-  Token count(std::string_view name, const Count& told) { return count(name, told, queue_); }
+  Token count(std::string_view name, const Count& calls) { return count(name, calls, queue_); }
 
-  // Posts and waits until `told` has risen.
-  void postAndWait(std::string_view name, const Count& told) {
-    const int before = valueOf(told);
+  // Posts and waits until the count has risen.
+  void postAndWait(std::string_view name, const Count& calls) {
+    const int before = valueOf(calls);
     EXPECT_FALSE(service().post(name));
-    EXPECT_TRUE(waitUntil([&] { return *told > before; }));
+    EXPECT_TRUE(waitUntil([&] { return *calls > before; }));
   }
 
   std::mutex mutex_;
   std::condition_variable changed_;
   ThreadQueue queue_{"test", QueuePriority::kUtility};
-  ThreadQueue witnessQueue_{"witness", QueuePriority::kUtility};
-  Kind kind_;  // last: its handlers use the above
+  ThreadQueue markerQueue_{"witness", QueuePriority::kUtility};
+  Kind kind_;  // last: its handlers use the members above
 };
 
 using Kinds = testing::Types<OnFiles, InMemory>;
 TYPED_TEST_SUITE(NotificationServiceContract, Kinds);
 
 TYPED_TEST(NotificationServiceContract, APostRunsTheHandlerOnItsQueueWithItsToken) {
-  const auto told = std::make_shared<Token>(NotificationService::kNoToken);
+  const auto calledToken = std::make_shared<Token>(NotificationService::kNoToken);
   const auto onQueue = std::make_shared<bool>(false);
   const auto registration =
-      this->service().registerHandler(kName, this->queue_, [this, told, onQueue](Token token) {
+      this->service().registerHandler(kName, this->queue_, [this, calledToken, onQueue](Token token) {
         this->change([&] {
-          *told = token;
+          *calledToken = token;
           *onQueue = this->queue_.isCurrent();
         });
       });
   EXPECT_EQ(registration.status, NotificationService::kStatusOk);
   EXPECT_NE(registration.token, NotificationService::kNoToken);
   EXPECT_FALSE(this->service().post(kName));
-  EXPECT_TRUE(this->waitUntil([&] { return *told == registration.token && *onQueue; }));
+  EXPECT_TRUE(this->waitUntil([&] { return *calledToken == registration.token && *onQueue; }));
 }
 
 TYPED_TEST(NotificationServiceContract, EachHandlerOfANameIsCalled) {
@@ -138,9 +147,9 @@ TYPED_TEST(NotificationServiceContract, TheStateIsZeroBeforeTheFirstPost) {
 }
 
 TYPED_TEST(NotificationServiceContract, APostKeepsTheState) {
-  const auto told = this->newCount();
-  const Token token = this->count(kName, told);
-  this->postAndWait(kName, told);
+  const auto calls = this->newCount();
+  const Token token = this->count(kName, calls);
+  this->postAndWait(kName, calls);
   EXPECT_EQ(this->service().state(token), 0U);
   EXPECT_FALSE(this->post(kName, 41));
   EXPECT_FALSE(this->service().post(kName));
@@ -148,100 +157,95 @@ TYPED_TEST(NotificationServiceContract, APostKeepsTheState) {
 }
 
 TYPED_TEST(NotificationServiceContract, ConsecutivePostsEachCallTheHandler) {
-  const auto told = this->newCount();
-  this->count(kName, told);
-  for (int post = 0; post < 5; ++post) this->postAndWait(kName, told);
+  const auto calls = this->newCount();
+  this->count(kName, calls);
+  for (int post = 0; post < 5; ++post) this->postAndWait(kName, calls);
 }
 
 TYPED_TEST(NotificationServiceContract, AHandlerSeesTheStateOfItsPost) {
   const auto seen = std::make_shared<std::optional<std::uint64_t>>();
-  const auto registration = this->service().registerHandler(kName, this->queue_, [this, seen](Token token) {
-    this->change([&] { *seen = this->service().state(token); });
-  });
-  EXPECT_EQ(registration.status, NotificationService::kStatusOk);
+  this->addHandler(
+      kName, [this, seen](Token token) { this->change([&] { *seen = this->service().state(token); }); });
   EXPECT_FALSE(this->post(kName, 7));
   EXPECT_TRUE(this->waitUntil([&] { return *seen == std::optional<std::uint64_t>(7); }));
 }
 
 TYPED_TEST(NotificationServiceContract, HandlersOfOtherNamesAreNotCalled) {
-  const auto told = this->newCount();
+  const auto calls = this->newCount();
   const auto others = this->newCount();
-  this->count(kName, told);
+  this->count(kName, calls);
   this->count(kOther, others);
   EXPECT_FALSE(this->service().post("com.orvane.test"));
   EXPECT_FALSE(this->service().post("nobody listens"));
   this->postAndWait(kOther, others);
-  EXPECT_EQ(this->valueOf(told), 0);
+  EXPECT_EQ(this->valueOf(calls), 0);
 }
 
 TYPED_TEST(NotificationServiceContract, ACancelledHandlerIsNotCalledAndHasNoState) {
-  const auto told = this->newCount();
-  const auto witness = this->newCount();
-  const Token token = this->count(kName, told);
-  this->count(kName, witness);
+  const auto calls = this->newCount();
+  const auto marker = this->newCount();
+  const Token token = this->count(kName, calls);
+  this->count(kName, marker);
   this->service().cancel(token);
   this->service().cancel(token);
   this->service().cancel(NotificationService::kNoToken);
-  this->postAndWait(kName, witness);
-  EXPECT_EQ(this->valueOf(told), 0);
+  this->postAndWait(kName, marker);
+  EXPECT_EQ(this->valueOf(calls), 0);
   EXPECT_EQ(this->service().state(token), std::nullopt);
 }
 
 TYPED_TEST(NotificationServiceContract, AHandlerMayCancelItsOwnToken) {
-  const auto told = this->newCount();
-  const auto witness = this->newCount();
-  const auto registration = this->service().registerHandler(kName, this->queue_, [this, told](Token token) {
+  const auto calls = this->newCount();
+  const auto marker = this->newCount();
+  this->addHandler(kName, [this, calls](Token token) {
     this->service().cancel(token);
-    this->increase(told);
+    this->increase(calls);
   });
-  EXPECT_EQ(registration.status, NotificationService::kStatusOk);
-  this->count(kName, witness);
-  for (int post = 0; post < 3; ++post) this->postAndWait(kName, witness);
-  EXPECT_EQ(this->valueOf(told), 1);
+  this->count(kName, marker);
+  for (int post = 0; post < 3; ++post) this->postAndWait(kName, marker);
+  EXPECT_EQ(this->valueOf(calls), 1);
 }
 
 TYPED_TEST(NotificationServiceContract, AQueuedHandlerDoesNotRunAfterItIsCancelled) {
-  const auto told = this->newCount();
-  const auto witness = this->newCount();
-  const Token token = this->count(kName, told);
-  // Handlers are queued in the order of their registrations: when this one runs, on a queue of its own, the
-  // first waits behind the piece of work below.
-  this->count(kName, witness, this->witnessQueue_);
+  const auto calls = this->newCount();
+  const auto marker = this->newCount();
+  const Token token = this->count(kName, calls);
+  // Handlers are queued in the order of their registrations. So when this one runs on its own queue, the
+  // first one is waiting behind the work below.
+  this->count(kName, marker, this->markerQueue_);
   std::promise<void> begun;
   this->queue_.async([&] {
     begun.set_value();
-    EXPECT_TRUE(this->waitUntil([&] { return *witness > 0; }));
+    EXPECT_TRUE(this->waitUntil([&] { return *marker > 0; }));
     this->service().cancel(token);
   });
   begun.get_future().wait();
   EXPECT_FALSE(this->service().post(kName));
   this->queue_.drain();
-  EXPECT_EQ(this->valueOf(told), 0);
+  EXPECT_EQ(this->valueOf(calls), 0);
 }
 
 TYPED_TEST(NotificationServiceContract, AHandlerMayRegisterAndPost) {
-  const auto told = this->newCount();
-  const auto registration = this->service().registerHandler(kName, this->queue_, [this, told](Token token) {
+  const auto calls = this->newCount();
+  this->addHandler(kName, [this, calls](Token token) {
     this->service().cancel(token);
-    this->count(kOther, told);
+    this->count(kOther, calls);
     EXPECT_FALSE(this->service().post(kOther));
   });
-  EXPECT_EQ(registration.status, NotificationService::kStatusOk);
   EXPECT_FALSE(this->service().post(kName));
-  EXPECT_TRUE(this->waitUntil([&] { return *told > 0; }));
+  EXPECT_TRUE(this->waitUntil([&] { return *calls > 0; }));
 }
 
 TYPED_TEST(NotificationServiceContract, APostDuringTheHandlerCallsItAgain) {
-  const auto told = this->newCount();
-  const auto registration = this->service().registerHandler(kName, this->queue_, [this, told](Token) {
-    if (this->valueOf(told) == 0) {
+  const auto calls = this->newCount();
+  this->addHandler(kName, [this, calls](Token) {
+    if (this->valueOf(calls) == 0) {
       EXPECT_FALSE(this->service().post(kName));
     }
-    this->increase(told);
+    this->increase(calls);
   });
-  EXPECT_EQ(registration.status, NotificationService::kStatusOk);
   EXPECT_FALSE(this->service().post(kName));
-  EXPECT_TRUE(this->waitUntil([&] { return *told >= 2; }));
+  EXPECT_TRUE(this->waitUntil([&] { return *calls >= 2; }));
 }
 
 TYPED_TEST(NotificationServiceContract, NamesThatAreNotFileNamesAreRefused) {
@@ -257,10 +261,10 @@ TYPED_TEST(NotificationServiceContract, NamesThatAreNotFileNamesAreRefused) {
 
 TYPED_TEST(NotificationServiceContract, TheLongestNameWorks) {
   const std::string name(255, 'a');
-  const auto told = this->newCount();
-  const Token token = this->count(name, told);
+  const auto calls = this->newCount();
+  const Token token = this->count(name, calls);
   EXPECT_FALSE(this->post(name, 3));
-  this->postAndWait(name, told);
+  this->postAndWait(name, calls);
   EXPECT_EQ(this->service().state(token), 3U);
 }
 
@@ -272,15 +276,15 @@ TYPED_TEST(NotificationServiceContract, AnUnknownTokenHasNoState) {
 TYPED_TEST(NotificationServiceContract, ManyPostsWaitAsOnePieceOfWork) {
   std::promise<void> release;
   this->queue_.async([released = release.get_future().share()] { released.wait(); });
-  const auto told = this->newCount();
-  const auto witness = this->newCount();
-  this->count(kName, told);
-  this->count(kOther, witness, this->witnessQueue_);
+  const auto calls = this->newCount();
+  const auto marker = this->newCount();
+  this->count(kName, calls);
+  this->count(kOther, marker, this->markerQueue_);
   for (int post = 0; post < 100; ++post) EXPECT_FALSE(this->service().post(kName));
-  this->postAndWait(kOther, witness);  // all posts before it have been seen
+  this->postAndWait(kOther, marker);  // all earlier posts have been handled
   release.set_value();
   this->queue_.drain();
-  EXPECT_EQ(this->valueOf(told), 1);
+  EXPECT_EQ(this->valueOf(calls), 1);
 }
 
 }  // namespace

@@ -17,7 +17,7 @@ using testing::Not;
 using testing::SizeIs;
 using Fault = OtlpReceiver::Fault;
 
-// So long that a test which waits for them fails by its own time-out.
+// Longer than the tests' own timeout, so that a test fails if it waits for them.
 constexpr CurlHttpClient::Timeouts kNever{hours(1), hours(1)};
 
 class CurlHttpClientTest : public testing::Test {

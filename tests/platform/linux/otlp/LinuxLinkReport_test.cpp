@@ -44,7 +44,7 @@ class LinuxLinkReportTest : public testing::Test {
   bool send(LinkReportSession& session, const ValueMap& payload) {
     return session.sendMessageWithCategory(4, 2, payload, problem_);
   }
-  // Opens the store with everything in it that was recorded.
+  // Opens the store after all recorded rows have been written.
   void openStore(SqliteDatabase& database) {
     store_.recordEvent(0.0, "com.orvane.last", {{"n", 1}});
     ASSERT_TRUE(store_.flush(seconds(30)));

@@ -55,7 +55,7 @@ TEST_F(OtlpOutboxTest, AFlushMakesWaitingRecordsDueAndNotLaterOnes) {
   EXPECT_TRUE(outbox_.flush());
   EXPECT_THAT(take(), SizeIs(512));
   add("later");
-  // The rest of what was flushed brings along what came later.
+  // The rest of the flushed records is taken together with later ones.
   EXPECT_THAT(take(), SizeIs(89));
   add("afterwards");
   EXPECT_THAT(take(), IsEmpty());

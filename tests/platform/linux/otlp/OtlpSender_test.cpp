@@ -52,12 +52,12 @@ class OtlpSenderTest : public testing::Test {
   void add(const std::string& record, Urgency urgency = Urgency::kAtOnce) {
     (void)outbox_.add("\"" + record + "\"", urgency, clock_.monotonic());  // some tests overfill the outbox
   }
-  // Sends what is due; the seconds until something will be, -1 when nothing waits.
+  // Sends all due records. Returns the seconds until the next ones are due, or -1 if no records wait.
   double send() {
     const auto wait = sender_.sendDue();
     return wait ? duration<double>(*wait).count() : -1.0;
   }
-  // What stands in the records' list of each request.
+  // The list of records in each request.
   std::vector<std::string> sent() const {
     std::vector<std::string> lists;
     for (const HttpRequest& request : client_.requests) {
@@ -184,14 +184,15 @@ TEST_F(OtlpSenderTest, SendsTooLargeBatchesInHalves) {
   client_.answers = {answerOf(413), answerOf(413), answerOf(200), answerOf(413)};
   for (const char* record : {"a", "b", "c", "d", "e"}) add(record);
   EXPECT_EQ(send(), -1.0);
-  // All, the first half, its halves of which the second is too large alone, the second half.
+  // All records; the first half; its two halves, of which the second has one record that is too large; the
+  // second half.
   EXPECT_THAT(sent(), ElementsAre("\"a\",\"b\",\"c\",\"d\",\"e\"", "\"a\",\"b\"", "\"a\"", "\"b\"",
                                   "\"c\",\"d\",\"e\""));
   EXPECT_THAT(errors(), ElementsAre(HasSubstr("a record is too large for it"),
                                     HasSubstr("records dropped meanwhile: 1")));
   EXPECT_EQ(outbox_.count(), 0U);
   add(std::string((std::size_t{8} << 20) - 100, 'x'));
-  EXPECT_EQ(outbox_.takeDropped(), 0U);  // all the room came back
+  EXPECT_EQ(outbox_.takeDropped(), 0U);  // all room is free again
 }
 
 TEST_F(OtlpSenderTest, HalvesThatCannotBeSentNowAreKept) {

@@ -53,7 +53,7 @@ TEST(RetryPolicyTest, WaitsAsLongAsTheEndpointAsksWithinLimits) {
 }
 
 TEST(RetryAfterTest, IsSecondsOrADate) {
-  constexpr double kNow = 784'111'717.0;  // ten to the date below
+  constexpr double kNow = 784'111'717.0;  // ten seconds before the date below
   EXPECT_EQ(parseRetryAfter("120", kNow), seconds(120));
   EXPECT_EQ(parseRetryAfter(" 7\r\n", kNow), seconds(7));
   EXPECT_EQ(parseRetryAfter(" Sun, 06 Nov 1994 08:48:47 GMT\r\n", kNow), seconds(10));

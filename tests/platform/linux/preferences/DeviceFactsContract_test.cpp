@@ -27,8 +27,8 @@ class TomlDeviceFactsTest : public testing::Test {
   LogCategory category_{log_, "com.orvane.tonewerk", "twrs"};
 };
 
-// What everything does that states facts; these are InternalBuild true, Released false, Text "true",
-// Number 1.
+// The contract of all sources of device facts. The facts are InternalBuild true, Released false, Text "true"
+// and Number 1.
 void expectContract(const DeviceFacts& facts) {
   EXPECT_EQ(facts.boolean("InternalBuild"), true);
   EXPECT_EQ(facts.boolean("Released"), false);

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The schema of the preferences against the adapters that read them.
+// Compares the schema of the preferences with the adapters that read them.
 #include "platform/PreferenceSchema.h"
 
 #include <gtest/gtest.h>
@@ -41,7 +41,7 @@ TEST(AdaptersPreferencesTest, TheStoresBoundsAreTheSchemasDefaults) {
   EXPECT_EQ(age->fallback->number() * 86'400, StoreBounds().seconds);
 }
 
-// What is read without the preference and with its default is the same.
+// Reading without the preference gives the same as reading its default.
 TEST(AdaptersPreferencesTest, TheDefaultListsAreTheSchemas) {
   const Value backends = *findPreference("com.orvane.linkreport", "backends")->fallback;
   EXPECT_EQ(LinkReportBackends::from(backends).names(), LinkReportBackends::from(std::nullopt).names());

@@ -37,7 +37,7 @@ struct InMemory {
   }
 };
 
-// What every preference store does.
+// The contract of all preference stores.
 template <typename Kind>
 class PreferenceStoreContract : public testing::Test {
  protected:

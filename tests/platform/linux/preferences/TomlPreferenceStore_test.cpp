@@ -55,7 +55,7 @@ TEST_F(TomlPreferenceStoreTest, TheWrittenFileHoldsOnlyWhatDiffers) {
   EXPECT_EQ(contentsOf(configured()), "a = 1\nb = 2\n");
 }
 
-// Read with a replacement, it would be written back with one.
+// If invalid bytes were replaced while reading, the replacement would be written back.
 TEST_F(TomlPreferenceStoreTest, AFileThatIsNotUtf8IsLoggedAndNotOverwritten) {
   const std::string contents = "name = \"Caf\xE9\"\n";
   write(written(), contents);
@@ -79,7 +79,7 @@ TEST_F(TomlPreferenceStoreTest, ReadsWhatAnotherProcessWrote) {
   EXPECT_EQ(store_.read(kDomain, "a"), Value(2));
 }
 
-// Two changes of one length within one tick of the file system's clock have the same stamp but for the inode,
+// Two changes of the same length within one tick of the file system's clock differ only in the inode number,
 // which may be used again.
 TEST_F(TomlPreferenceStoreTest, ReadsEveryOfManyQuickChanges) {
   TomlPreferenceStore other(directory_.path("configuration"), directory_.path("state"), category_);
@@ -151,7 +151,7 @@ TEST_F(TomlPreferenceStoreTest, AnInvalidConfigurationDoesNotPreventWrites) {
 TEST_F(TomlPreferenceStoreTest, AFailedWriteChangesNothing) {
   EXPECT_FALSE(store_.write(kDomain, "a", 1));
   std::string problem;
-  EXPECT_TRUE(store_.write(kDomain, "a", "\xFF", &problem));  // no UTF-8, so no TOML
+  EXPECT_TRUE(store_.write(kDomain, "a", "\xFF", &problem));  // not UTF-8, so not TOML
   EXPECT_NE(problem, "");
   EXPECT_TRUE(store_.write(kDomain, "a", Date{1e15}, &problem));
   EXPECT_EQ(store_.read(kDomain, "a"), Value(1));
@@ -181,7 +181,7 @@ TEST_F(TomlPreferenceStoreTest, APipeInAFilesPlaceDoesNotBlock) {
   EXPECT_TRUE(store_.write(kDomain, "a", 1));
 }
 
-// Root who wrote one preference of the daemon's once took the whole directory from it.
+// Regression: after root had written one preference, the daemon could not write to the directory any more.
 class PreferencesOfRootTest : public TomlPreferenceStoreTest {
  protected:
   void SetUp() override {

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The metric record through the real encoding.
+// Writes and reads the metric record with the real encoding.
 #include "platform/pb/AudioIssueDetected.h"
 
 #include <array>
@@ -113,12 +113,12 @@ TEST(AudioIssueDetectedTest, AVarintOfTenBytesIsReadAndOneOfElevenIsAnError) {
 }
 
 TEST(AudioIssueDetectedTest, DamagedInputIsAnErrorAndKeepsWhatCameBefore) {
-  for (const std::string& damage : {bytes({0x1A, 0x05, 'x'}),                     // bytes that end early
-                                    bytes({0x08, 0x80}),                          // a varint that does
-                                    bytes({0x31, 1, 2}),                          // a 64-bit value that does
-                                    bytes({0x1A, 0xFF, 0xFF, 0xFF, 0xFF, 0x0F}),  // a length that nothing has
+  for (const std::string& damage : {bytes({0x1A, 0x05, 'x'}),  // bytes that end early
+                                    bytes({0x08, 0x80}),       // a varint that ends early
+                                    bytes({0x31, 1, 2}),       // a 64-bit value that ends early
+                                    bytes({0x1A, 0xFF, 0xFF, 0xFF, 0xFF, 0x0F}),  // a length beyond the input
                                     bytes({0x33, 0x08}),                          // a group without an end
-                                    bytes({0x33, 0x3C}),           // a group with another's end
+                                    bytes({0x33, 0x3C}),           // a group with the end of another
                                     bytes({0x36}), bytes({0x37}),  // wire types that do not exist
                                     bytes({0x00, 0x01}),           // tag 0
                                     std::string(100, '\x33')}) {   // groups without end
@@ -181,7 +181,7 @@ RC_GTEST_PROP(AudioIssueDetectedProperty, SurvivesAnyBytes, (const std::string& 
   RC_ASSERT(again == record);
 }
 
-// What protoc makes of a record, by the description that docs/ ships.
+// Decodes a record with protoc and the description in docs/.
 TEST(AudioIssueDetectedTest, DecodesWithTheDescriptionThatDocsShip) {
   TemporaryDirectory temporary;
   const std::string file = temporary.path("record");

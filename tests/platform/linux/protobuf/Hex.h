@@ -7,7 +7,7 @@
 
 namespace tonewerk {
 
-// The bytes that two hexadecimal digits each name: fromHex("94 00") is two bytes.
+// Converts pairs of hexadecimal digits into bytes: fromHex("94 00") is two bytes.
 inline std::string fromHex(std::string_view digits) {
   std::string bytes;
   std::string pair;

@@ -30,7 +30,7 @@ TEST(LinuxProcessInformationTest, KnowsThisProcess) {
   EXPECT_EQ(processes.ownProcessIdentifier(), getpid());
   const auto name = processes.processName(getpid());
   ASSERT_TRUE(name.has_value());
-  EXPECT_EQ(*name, "tonewerk_adapte");  // the first 15 bytes of the test program's
+  EXPECT_EQ(*name, "tonewerk_adapte");  // the first 15 bytes of the test program's name
 }
 
 TEST(LinuxProcessInformationTest, AProcessThatIsNotThereHasNoName) {
@@ -46,7 +46,7 @@ TEST(LinuxProcessInformationTest, ANameKeepsItsSpaces) {
   EXPECT_EQ(proc.information().processName(7), "Web Content ");
 }
 
-// "lecteur-musiqué", cut where the kernel cuts names: after 15 bytes.
+// "lecteur-musiqué", cut after 15 bytes, as the kernel does.
 TEST(LinuxProcessInformationTest, ANameThatEndsInHalfACharacterEndsInTheReplacementCharacter) {
   MadeProc proc;
   proc.write("7/comm", "lecteur-musiqu\xC3\n");

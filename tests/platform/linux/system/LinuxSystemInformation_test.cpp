@@ -19,7 +19,7 @@ struct TripPoint {
   int temperature;  // in thousandths of a degree Celsius
 };
 
-// A /sys as the test makes it, and no D-Bus.
+// A /sys with files of the test, and no D-Bus.
 class LinuxSystemInformationTest : public testing::Test {
  protected:
   void write(const std::string& name, const std::string& text) {
@@ -37,7 +37,7 @@ class LinuxSystemInformationTest : public testing::Test {
     }
   }
 
-  // A second later than what was read before.
+  // Moves the clock beyond the age at which values are read again.
   int thermalLevel() {
     clock_.advance(1.5);
     return system_.thermalLevel();

@@ -27,7 +27,7 @@ constexpr std::array<sd_bus_vtable, 3> kTable = {{
     SD_BUS_VTABLE_END,
 }};
 
-// The power-profiles service, run by the test's own thread while it waits.
+// Imitates the power-profiles service. The test's own thread runs it while it waits.
 class FakeService {
  public:
   FakeService(const std::string& address, std::string profile) : profile_(std::move(profile)) {
@@ -47,7 +47,7 @@ class FakeService {
     EXPECT_GE(sd_bus_emit_properties_changed(bus_, kPath, kName, "ActiveProfile", nullptr), 0);
   }
 
-  // Answers what is there, or waits a little for more.
+  // Handles pending messages, or waits a short time for new ones.
   void serve() {
     while (sd_bus_process(bus_, nullptr) > 0) {
     }
@@ -59,7 +59,7 @@ class FakeService {
   std::string profile_;
 };
 
-// What a watcher told.
+// Collects a watcher's reports.
 class Reports {
  public:
   void add(bool isPowerSaver) {
@@ -83,7 +83,7 @@ class PowerProfileWatcherTest : public testing::Test {
  protected:
   void SetUp() override { ASSERT_TRUE(bus_.isRunning()) << "dbus-daemon does not run"; }
 
-  // The watcher's next report; none within ten seconds.
+  // The watcher's next report; none if there is no report within ten seconds.
   std::optional<bool> nextReport(FakeService& service) {
     const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(10);
     while (std::chrono::steady_clock::now() < end) {
@@ -104,7 +104,7 @@ TEST_F(PowerProfileWatcherTest, ReportsThePresentProfileAndItsChanges) {
   EXPECT_EQ(nextReport(service), true);
   service.choose("balanced");
   EXPECT_EQ(nextReport(service), false);
-  service.choose("performance");  // no change of what is told
+  service.choose("performance");  // still not power-saver, so no report
   service.choose("power-saver");
   EXPECT_EQ(nextReport(service), true);
 }

@@ -25,7 +25,7 @@ std::string outputOf(const char* command) {
 }
 
 TEST(UsdtTracePointsTest, TheProgramHasAProbeThatTracersFind) {
-  UsdtTracePoints().emit(7);  // what the linker keeps
+  UsdtTracePoints().emit(7);  // keeps the linker from removing the probe
   const std::string command = "readelf --notes /proc/" + std::to_string(getpid()) + "/exe";
   const std::string notes = outputOf(command.c_str());
   EXPECT_THAT(notes, HasSubstr("Provider: tonewerk"));

@@ -22,7 +22,7 @@ using testing::ElementsAre;
 using testing::HasSubstr;
 using testing::StartsWith;
 
-// Files of the kernel's, made by the test.
+// A directory in which tests write files like the kernel's.
 class CollectorsTest : public testing::Test {
  protected:
   void put(const std::string& name, const std::string& text) {

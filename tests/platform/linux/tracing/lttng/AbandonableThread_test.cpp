@@ -46,7 +46,7 @@ TEST(AbandonableThreadTest, SaysHowLongItHasBeenBusy) {
   while (thread.queue()->busyFor() != 0ms) std::this_thread::yield();
 }
 
-// What a frozen session daemon does to the daemon's end.
+// A session daemon that hangs has this effect at the daemon's end.
 TEST(AbandonableThreadTest, AbandonsATaskThatDoesNotReturn) {
   const auto proceed = std::make_shared<std::promise<void>>();
   const auto ended = std::make_shared<std::promise<void>>();

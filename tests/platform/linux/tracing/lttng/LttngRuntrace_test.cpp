@@ -32,7 +32,7 @@ std::uint64_t nanosecondsNow() {
 
 class LttngRuntraceTest : public testing::Test {
  protected:
-  // Starts a trace; the test fails when that does.
+  // Starts a trace. The test fails if that fails.
   std::shared_ptr<RuntraceSession> startWell(const std::string& probes = kProbes) {
     auto session = rig_.start(listener_, probes);
     EXPECT_TRUE(listener_->waitForStart());
@@ -41,7 +41,7 @@ class LttngRuntraceTest : public testing::Test {
     return session;
   }
 
-  // Stops it and reads the probes' events.
+  // Stops the trace and reads the probes' events.
   std::vector<KolviProbe> finish(RuntraceSession& session, const std::string& probes = kProbes) {
     session.stopRuntrace();
     EXPECT_TRUE(listener_->waitForCompletion());
@@ -59,7 +59,7 @@ class LttngRuntraceTest : public testing::Test {
     return model->makeProbes(*probeDictionariesOf(*rig_.json.parse(probes, problem_)));
   }
 
-  // What an attempt to start says; empty when it works.
+  // The problem of an attempt to start; empty if it succeeds.
   std::string startProblem(const std::string& probeListPath) {
     const auto session = rig_.runtrace->makeSession({.probeListPath = probeListPath});
     session->setDelegate(listener_);
@@ -132,7 +132,7 @@ TEST_F(LttngRuntraceTest, TracesOnlyWhatTheListNames) {
   const auto found = finish(*session, probes);
   ASSERT_THAT(found, SizeIs(3));
   for (const KolviProbe& probe : found) EXPECT_THAT(probe.events, SizeIs(1)) << probe.name;
-  // Nor is anything else in the trace.
+  // The trace contains no other signposts.
   const auto all = read(R"([{"name": "decode", "type": "interval"}, {"name": "x", "type": "interval"},
                             {"name": "other", "type": "interval"}])");
   for (const KolviProbe& probe : all) EXPECT_THAT(probe.events, IsEmpty()) << probe.name;
@@ -170,7 +170,7 @@ TEST_F(LttngRuntraceTest, OneTraceAfterTheOtherEachHasItsOwn) {
 TEST_F(LttngRuntraceTest, TheTraceIsRemovedWithItsToken) {
   const auto session = startWell();
   finish(*session);
-  rig_.runtrace.reset();  // whose thread may have held it until now
+  rig_.runtrace.reset();  // its thread may have used the directory until now
   EXPECT_TRUE(fs::exists(listener_->location));
   listener_->token.reset();
   EXPECT_FALSE(fs::exists(listener_->location));
@@ -180,11 +180,11 @@ TEST_F(LttngRuntraceTest, AnAbandonedSessionLeavesNothing) {
   auto session = startWell();
   session.reset();
   listener_ = std::make_shared<TraceListener>();
-  session = startWell();  // after the other has ended
+  session = startWell();  // after the other one has ended
   session->stopRuntrace();
   EXPECT_TRUE(listener_->waitForCompletion());
   listener_->token.reset();
-  rig_.runtrace.reset();  // whose thread may have held it until now
+  rig_.runtrace.reset();  // its thread may have used the directory until now
   for (const auto& entry : fs::directory_iterator(rig_.directory.path("traces"))) {
     EXPECT_FALSE(entry.is_directory()) << entry.path();
   }
@@ -213,12 +213,12 @@ TEST_F(LttngRuntraceTest, ARemovedDelegateIsNotCalled) {
   session->setDelegate({});
   session->stopRuntrace();
   const auto other = std::make_shared<TraceListener>();
-  const auto next = rig_.start(other, kProbes);  // behind the stop
+  const auto next = rig_.start(other, kProbes);  // queued after the stop
   EXPECT_TRUE(other->waitForStart());
   EXPECT_EQ(listener_->location, "");
 }
 
-// What can be wrong with a start.
+// Failures of a start.
 
 TEST_F(LttngRuntraceTest, AStartSaysWhatIsWrongWithTheProbeList) {
   EXPECT_THAT(startProblem("/nowhere/probes.json"),
@@ -248,7 +248,7 @@ TEST_F(LttngRuntraceTest, AStartSaysWhatTheSessionDaemonEndedWith) {
   EXPECT_EQ(problem, "lttng-sessiond ended at once: Error: somebody else has it");
 }
 
-// What can go wrong with a trace.
+// Failures of a running trace.
 
 TEST_F(LttngRuntraceTest, ATraceWithLostEventsIsRefused) {
   const auto session = startWell();
@@ -256,7 +256,7 @@ TEST_F(LttngRuntraceTest, ATraceWithLostEventsIsRefused) {
   if (daemon == 0) GTEST_SKIP() << "the session daemon is somebody else's";
   const pid_t writer = TracingRig::writerOf(daemon);
   ASSERT_GT(writer, 0);
-  ::kill(writer, SIGSTOP);  // so that nobody empties the buffers
+  ::kill(writer, SIGSTOP);  // so that the buffers are not read
   for (int i = 0; i < 400'000; ++i) {
     const signpost::Interval interval("decode");
   }
@@ -308,7 +308,7 @@ TEST_F(LttngRuntraceTest, EndsThePrivateSessionDaemonWithItself) {
   EXPECT_EQ(::kill(daemon, 0), -1);
 }
 
-// The limit's clock is the test's, so that nobody waits for it.
+// The time limit uses a timer of the test, so that the test does not have to wait.
 TEST(LttngRuntraceTimesTest, AFrozenSessionDaemonIsKilledAndTheCallFails) {
   ManualClock clock;
   ManualTimers timers(clock);
@@ -346,7 +346,7 @@ TEST(FiltersForTest, MakesSeveralOfManyNames) {
   EXPECT_EQ(conditions, 200U);
 }
 
-// Reading.
+// Reading a trace.
 
 TEST_F(LttngRuntraceTest, ADamagedTraceIsRefusedInTime) {
   const auto session = startWell();

@@ -22,7 +22,7 @@
 
 namespace tonewerk {
 
-// Hears what a trace session says, and lets the test wait for it.
+// Records the calls of a trace session's delegate, and lets the test wait for them.
 class TraceListener final : public RuntraceSessionDelegate {
  public:
   static constexpr std::chrono::seconds kPatience{100};
@@ -40,11 +40,11 @@ class TraceListener final : public RuntraceSessionDelegate {
     completed_->signal();
   }
 
-  // False when nothing comes.
+  // False if there is no call in time.
   bool waitForStart() { return started_->wait(kPatience); }
   bool waitForCompletion() { return completed_->wait(kPatience); }
 
-  // To be read after the wait.
+  // Read these only after waiting.
   RuntraceError startError;
   RuntraceError stopError;
   RuntraceError completionError;
@@ -57,8 +57,8 @@ class TraceListener final : public RuntraceSessionDelegate {
   const std::unique_ptr<Semaphore> completed_ = semaphores_.makeSemaphore();
 };
 
-// The real thing: a session daemon, this very process's signposts, the trace reader. One test of the
-// machine's at a time has it, since root's session daemon is one for all.
+// Traces with a real session daemon, this process's signposts and the trace reader. Only one test on the
+// machine may use it at a time, because all of root's programs share one session daemon.
 class TracingRig {
  public:
   explicit TracingRig(TimerService* otherTimers = nullptr)
@@ -71,7 +71,7 @@ class TracingRig {
     return directory.path("probes.json");
   }
 
-  // A session that has been asked to start.
+  // Makes a session and starts it.
   std::shared_ptr<RuntraceSession> start(const std::shared_ptr<TraceListener>& listener,
                                          const std::string& probes) {
     auto session = runtrace->makeSession({.probeListPath = writeProbes(probes)});
@@ -80,7 +80,7 @@ class TracingRig {
     return session;
   }
 
-  // This process's private session daemon, 0 without one.
+  // The process of the private session daemon of this process; 0 if there is none.
   static pid_t sessionDaemon() { return childNamed("lttng-sessiond", ::getpid()); }
   static pid_t writerOf(pid_t sessionDaemon) { return childNamed("lttng-consumerd", sessionDaemon); }
 
@@ -110,7 +110,7 @@ class TracingRig {
   }
 
  public:
-  std::unique_ptr<LttngRuntrace> runtrace;  // last: it uses all above
+  std::unique_ptr<LttngRuntrace> runtrace;  // last: it uses the members above
 };
 
 }  // namespace tonewerk
