@@ -27,6 +27,18 @@ std::uint32_t seed() {
   return static_cast<std::uint32_t>(now ^ (now >> 32U) ^ static_cast<std::uint64_t>(::getpid()));
 }
 
+// Releases a mutex that the caller holds, until the scope ends.
+class SCOPED_CAPABILITY MutexUnlock {
+ public:
+  explicit MutexUnlock(Mutex& mutex) RELEASE(mutex) : mutex_(mutex) { mutex_.unlock(); }
+  MutexUnlock(const MutexUnlock&) = delete;
+  MutexUnlock& operator=(const MutexUnlock&) = delete;
+  ~MutexUnlock() RELEASE() { mutex_.lock(); }
+
+ private:
+  Mutex& mutex_;
+};
+
 }  // namespace
 
 ClientEngine::ClientEngine(ClientSettings settings)
@@ -58,7 +70,7 @@ void ClientEngine::wake() {
 twr_status ClientEngine::connect(milliseconds timeout) {
   if (ClientThread::isCurrent()) return TWR_WOULD_WAIT;
   if (hasForked_) return TWR_FORKED;
-  Lock lock(mutex_);
+  MutexLock lock(mutex_);
   if (state_ == TWR_STATE_CONNECTED) return TWR_OK;
   if (state_ == TWR_STATE_ENDED) return TWR_NOT_CONNECTED;
   const auto waiter = std::make_shared<Waiter>();
@@ -69,7 +81,7 @@ twr_status ClientEngine::connect(milliseconds timeout) {
 twr_status ClientEngine::flush(milliseconds timeout) {
   if (ClientThread::isCurrent()) return TWR_WOULD_WAIT;
   if (hasForked_) return TWR_FORKED;
-  Lock lock(mutex_);
+  MutexLock lock(mutex_);
   if (outbox_.isEmpty()) return TWR_OK;
   if (state_ == TWR_STATE_ENDED) return TWR_NOT_CONNECTED;
   const auto waiter = std::make_shared<Waiter>();
@@ -77,13 +89,14 @@ twr_status ClientEngine::flush(milliseconds timeout) {
   return await(lock, waiter, timeout);
 }
 
-twr_status ClientEngine::await(Lock& lock, const std::shared_ptr<Waiter>& waiter, milliseconds timeout) {
+twr_status ClientEngine::await(MutexLock& lock, const std::shared_ptr<Waiter>& waiter, milliseconds timeout) {
   // Somebody waits: not for the back-off.
   nextAttempt_ = Clock::now();
   if (!ensureRunning()) return TWR_NO_MEMORY;
   wake();
   const auto until = Clock::now() + std::max(timeout, milliseconds::zero());
-  waiter->condition.wait_until(lock, until, [&] { return waiter->isDone; });
+  while (!waiter->isDone && waiter->condition.waitUntil(lock, until)) {
+  }
   if (waiter->isDone) return waiter->status;
   outbox_.removeBarrier(*waiter);
   std::erase(connectWaiters_, waiter);
@@ -91,13 +104,13 @@ twr_status ClientEngine::await(Lock& lock, const std::shared_ptr<Waiter>& waiter
 }
 
 void ClientEngine::end(milliseconds timeout) {
-  Lock lock(mutex_);
+  MutexLock lock(mutex_);
   beginToEnd(timeout);
   joinThread(lock);
 }
 
 bool ClientEngine::endByItself(milliseconds timeout) {
-  const Lock lock(mutex_);
+  const MutexLock lock(mutex_);
   if (!thread_.isThisThread()) return false;
   isDetached_ = true;
   beginToEnd(timeout);
@@ -112,19 +125,24 @@ void ClientEngine::beginToEnd(milliseconds timeout) {
 }
 
 // The library's end may come while somebody destroys the client: one of the two joins, the other waits.
-void ClientEngine::joinThread(Lock& lock) {
+void ClientEngine::joinThread(MutexLock& lock) {
   if (!thread_.isRunning()) return;
-  if (isBeingJoined_) return joined_.wait(lock, [this] { return !thread_.isRunning(); });
+  if (isBeingJoined_) {
+    while (thread_.isRunning()) joined_.wait(lock);
+    return;
+  }
   isBeingJoined_ = true;
-  lock.unlock();
-  thread_.join();
-  lock.lock();
+  const ClientThread thread = thread_;
+  {
+    const MutexUnlock unlocked(mutex_);
+    thread.join();
+  }
   thread_.forget();
-  joined_.notify_all();
+  joined_.notifyAll();
 }
 
 twr_client_info ClientEngine::info() const {
-  const Lock lock(mutex_);
+  const MutexLock lock(mutex_);
   twr_client_info info{};
   info.size = sizeof(info);
   info.state = state_;
@@ -139,6 +157,11 @@ twr_client_info ClientEngine::info() const {
 
 // ---- for the registry ----
 
+void ClientEngine::afterForkInChild() {
+  becomeForked();
+  mutex_.unlock();
+}
+
 void ClientEngine::becomeForked() {
   hasForked_ = true;
   state_ = TWR_STATE_ENDED;
@@ -149,22 +172,22 @@ void ClientEngine::becomeForked() {
 }
 
 bool ClientEngine::hasThread() const {
-  const Lock lock(mutex_);
+  const MutexLock lock(mutex_);
   return thread_.isRunning() && !thread_.isThisThread();
 }
 
 bool ClientEngine::isReapable() const {
-  const Lock lock(mutex_);
+  const MutexLock lock(mutex_);
   return isDetached_ && hasFinished_;
 }
 
 void ClientEngine::abandon() {
   {
-    const Lock lock(mutex_);
+    const MutexLock lock(mutex_);
     isAbandoned_ = true;
   }
   end(milliseconds::zero());
-  const Lock lock(mutex_);
+  const MutexLock lock(mutex_);
   event_.close();
 }
 
@@ -173,30 +196,30 @@ void ClientEngine::abandon() {
 void ClientEngine::runThread(void* self) { static_cast<ClientEngine*>(self)->run(); }
 
 void ClientEngine::run() {
-  Lock lock(mutex_);
+  const MutexLock lock(mutex_);
   nextAttempt_ = Clock::now();
   while (!isDone()) {
     try {
-      work(lock);
+      work();
     } catch (const std::bad_alloc&) {
       connectionLost(ENOMEM);
     }
-    if (deliver(lock)) {
+    if (deliver()) {
       if (hasForked_) return;  // a callback forked, and this is the child
       continue;
     }
-    if (!isDone()) sleep(lock);
+    if (!isDone()) sleep();
   }
-  finish(lock);
+  finish();
   hasFinished_ = !hasForked_;
 }
 
-void ClientEngine::work(Lock& lock) {
+void ClientEngine::work() {
   if (state_ == TWR_STATE_ENDED) return;
-  if (!socket_.isOpen() && Clock::now() >= nextAttempt_) attempt(lock);
+  if (!socket_.isOpen() && Clock::now() >= nextAttempt_) attempt();
   if (!socket_.isOpen()) return;
-  if (isReadable_) receive(lock);
-  if (socket_.isOpen() && !hasEndedSending_) transmit(lock);
+  if (isReadable_) receive();
+  if (socket_.isOpen() && !hasEndedSending_) transmit();
 }
 
 bool ClientEngine::isDone() const {
@@ -205,7 +228,7 @@ bool ClientEngine::isDone() const {
   return !socket_.isOpen() && outbox_.isEmpty();
 }
 
-void ClientEngine::finish(Lock& lock) {
+void ClientEngine::finish() {
   const bool isLetGo = socket_.isOpen();
   socket_.close();
   if (isAbandoned_) {
@@ -217,17 +240,17 @@ void ClientEngine::finish(Lock& lock) {
   state_ = TWR_STATE_ENDED;
   for (const std::shared_ptr<Waiter>& waiter : std::exchange(connectWaiters_, {}))
     waiter->finish(TWR_NOT_CONNECTED);
-  while (deliver(lock)) {
+  while (deliver()) {
     if (hasForked_) return;
   }
 }
 
-void ClientEngine::attempt(Lock& lock) {
+void ClientEngine::attempt() {
   setState(TWR_STATE_CONNECTING);
   // The first place at which there is something says more than the last, at which there may be nothing.
   int problem = ENOENT;
   for (const std::string& path : settings_.socketPaths) {
-    const int error = connectTo(lock, path);
+    const int error = connectTo(path);
     if (error == 0) return connected(path);
     if (problem == ENOENT) problem = error;
   }
@@ -235,12 +258,13 @@ void ClientEngine::attempt(Lock& lock) {
 }
 
 // The descriptor is the member all the while, so that a child process closes its copy.
-int ClientEngine::connectTo(Lock& lock, const std::string& path) {
+int ClientEngine::connectTo(const std::string& path) {
   int error = socket_.open();
   if (error != 0) return error;
-  lock.unlock();
-  error = socket_.connect(path);
-  lock.lock();
+  {
+    const MutexUnlock unlocked(mutex_);
+    error = socket_.connect(path);
+  }
   if (error != 0) socket_.close();
   return error;
 }
@@ -291,7 +315,7 @@ void ClientEngine::waitBeforeNextAttempt(int error) {
   }
 }
 
-void ClientEngine::transmit(Lock& lock) {
+void ClientEngine::transmit() {
   for (int at = 0; at < kMaxTransfers; ++at) {
     const std::string_view bytes = outbox_.unsent();
     if (bytes.empty()) {
@@ -303,9 +327,11 @@ void ClientEngine::transmit(Lock& lock) {
       socket_.endSending();
       return;
     }
-    lock.unlock();
-    const ClientSocket::Transfer transfer = socket_.send(bytes);
-    lock.lock();
+    ClientSocket::Transfer transfer;
+    {
+      const MutexUnlock unlocked(mutex_);
+      transfer = socket_.send(bytes);
+    }
     awaitsRoom_ = transfer.error == EAGAIN;
     if (awaitsRoom_) return;
     if (transfer.error != 0) return connectionLost(transfer.error);
@@ -314,12 +340,14 @@ void ClientEngine::transmit(Lock& lock) {
   isWoken_ = true;  // there may be more
 }
 
-void ClientEngine::receive(Lock& lock) {
+void ClientEngine::receive() {
   std::array<char, kReadBytes> bytes;
   for (int at = 0; at < kMaxTransfers; ++at) {
-    lock.unlock();
-    const ClientSocket::Transfer transfer = socket_.receive(bytes.data(), bytes.size());
-    lock.lock();
+    ClientSocket::Transfer transfer;
+    {
+      const MutexUnlock unlocked(mutex_);
+      transfer = socket_.receive(bytes.data(), bytes.size());
+    }
     isReadable_ = transfer.error != EAGAIN;
     if (!isReadable_) return;
     if (transfer.error != 0) return connectionLost(transfer.error);
@@ -339,12 +367,12 @@ bool ClientEngine::decode(std::string_view bytes) {
   }
 }
 
-bool ClientEngine::deliver(Lock& lock) {
+bool ClientEngine::deliver() {
   if (deliveries_.empty()) return false;
   const Deliveries deliveries = std::exchange(deliveries_, {});
-  lock.unlock();
   for (const Delivery& delivery : deliveries) {
-    if (delivery.state && isDetached_) continue;  // set on this thread, by what is called here
+    if (delivery.state && isDetached_) continue;  // a callback before this one destroyed the client
+    const MutexUnlock unlocked(mutex_);
     if (delivery.state) {
       settings_.stateChanged(settings_.context, *delivery.state);
     } else {
@@ -352,19 +380,20 @@ bool ClientEngine::deliver(Lock& lock) {
     }
     if (hasForked_) break;
   }
-  if (!hasForked_) lock.lock();
   return true;
 }
 
-void ClientEngine::sleep(Lock& lock) {
+void ClientEngine::sleep() {
   if (std::exchange(isWoken_, false)) return;
   const short events = awaitsRoom_ ? POLLIN | POLLOUT : POLLIN;
   std::array<pollfd, 2> polled{{{event_.fileDescriptor(), POLLIN, 0}, {socket_.fileDescriptor(), events, 0}}};
   const int timeout = pollTimeout();
   isSleeping_ = true;
-  lock.unlock();
-  const int count = ::poll(polled.data(), polled.size(), timeout);
-  lock.lock();
+  int count = 0;
+  {
+    const MutexUnlock unlocked(mutex_);
+    count = ::poll(polled.data(), polled.size(), timeout);
+  }
   isSleeping_ = false;
   isWoken_ = false;
   if (count <= 0) return;

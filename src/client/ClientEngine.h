@@ -3,11 +3,9 @@
 
 #include <atomic>
 #include <chrono>
-#include <condition_variable>
 #include <cstddef>
 #include <cstdint>
 #include <memory>
-#include <mutex>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -22,6 +20,7 @@
 #include "platform/linux/descriptors/WakeEvent.h"
 #include "platform/linux/messagepack/RpcFrameReader.h"
 #include "tonewerk/reporting.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -66,14 +65,14 @@ class ClientEngine {
   template <class Ask>
   twr_status request(Ask ask) {
     if (hasForked_.load(std::memory_order_relaxed)) return TWR_FORKED;
-    const std::unique_lock lock(mutex_);
+    const MutexLock lock(mutex_);
     if (state_ == TWR_STATE_ENDED) return TWR_NOT_CONNECTED;
     return ensureRunning() ? ask(outbox_) : TWR_NO_MEMORY;
   }
   // The same for what must be done whether the client has ended or not, or has forked away.
   template <class Do>
   auto withOutbox(Do function) {
-    const std::unique_lock lock(mutex_);
+    const MutexLock lock(mutex_);
     auto result = function(outbox_);
     if (state_ != TWR_STATE_ENDED) ensureRunning();
     return result;
@@ -96,10 +95,11 @@ class ClientEngine {
   // Under the registry's mutex. The owner is what this is a part of, and holds itself until it is removed.
   ClientEngine* nextClient = nullptr;
   std::shared_ptr<void> owner;
-  void beforeFork() { mutex_.lock(); }
-  void afterFork() { mutex_.unlock(); }
-  // In the child, between the two.
-  void becomeForked();
+  // A fork holds the mutexes of all clients at once. The analysis cannot follow one mutex for each object in
+  // a list.
+  void beforeFork() NO_THREAD_SAFETY_ANALYSIS { mutex_.lock(); }
+  void afterForkInParent() NO_THREAD_SAFETY_ANALYSIS { mutex_.unlock(); }
+  void afterForkInChild() NO_THREAD_SAFETY_ANALYSIS;
   // One that may be joined from here.
   bool hasThread() const;
   // Ended by itself, and nothing is left to be done but to join its thread.
@@ -108,79 +108,87 @@ class ClientEngine {
   void abandon();
 
  private:
-  using Lock = std::unique_lock<std::mutex>;
   using Clock = std::chrono::steady_clock;
 
-  // Under the mutex, callers'. False when there can be no thread.
-  bool ensureRunning();
-  void wake();
-  twr_status await(Lock& lock, const std::shared_ptr<Waiter>& waiter, std::chrono::milliseconds timeout);
-  void beginToEnd(std::chrono::milliseconds timeout);
-  void joinThread(Lock& lock);
+  // Called by callers. False when there can be no thread.
+  bool ensureRunning() REQUIRES(mutex_);
+  void wake() REQUIRES(mutex_);
+  twr_status await(MutexLock& lock, const std::shared_ptr<Waiter>& waiter, std::chrono::milliseconds timeout)
+      REQUIRES(mutex_);
+  void beginToEnd(std::chrono::milliseconds timeout) REQUIRES(mutex_);
+  void joinThread(MutexLock& lock) REQUIRES(mutex_);
 
-  // The thread's, under the mutex but where they say so by taking the lock.
+  void becomeForked() REQUIRES(mutex_);
+
+  // Called on the thread.
   static void runThread(void* self);
   void run();
-  void work(Lock& lock);
-  bool isDone() const;
-  void finish(Lock& lock);
-  void attempt(Lock& lock);
-  int connectTo(Lock& lock, const std::string& path);
-  void connected(const std::string& path);
-  void attemptFailed(int error);
-  void transmit(Lock& lock);
-  void receive(Lock& lock);
-  bool decode(std::string_view bytes);
-  void connectionLost(int error);
+  bool isDone() const REQUIRES(mutex_);
+  void connected(const std::string& path) REQUIRES(mutex_);
+  void attemptFailed(int error) REQUIRES(mutex_);
+  bool decode(std::string_view bytes) REQUIRES(mutex_);
+  void connectionLost(int error) REQUIRES(mutex_);
   // Why answers that are still to come will not.
-  twr_status whyUnanswered() const { return hasEndedSending_ ? TWR_DESTROYED : TWR_NOT_CONNECTED; }
-  void waitBeforeNextAttempt(int error);
+  twr_status whyUnanswered() const REQUIRES(mutex_) {
+    return hasEndedSending_ ? TWR_DESTROYED : TWR_NOT_CONNECTED;
+  }
+  void waitBeforeNextAttempt(int error) REQUIRES(mutex_);
+  int pollTimeout() REQUIRES(mutex_);
+  void setState(twr_state state) REQUIRES(mutex_);
+
+  // Called on the thread. These release the mutex for a while and hold it again when they return.
+  void work() REQUIRES(mutex_);
+  void finish() REQUIRES(mutex_);
+  void attempt() REQUIRES(mutex_);
+  int connectTo(const std::string& path) REQUIRES(mutex_);
+  void transmit() REQUIRES(mutex_);
+  void receive() REQUIRES(mutex_);
   // False when there was nothing to call.
-  bool deliver(Lock& lock);
-  void sleep(Lock& lock);
-  int pollTimeout();
-  void setState(twr_state state);
+  bool deliver() REQUIRES(mutex_);
+  void sleep() REQUIRES(mutex_);
 
   const ClientSettings settings_;
   std::atomic<bool> hasForked_{false};
 
-  mutable std::mutex mutex_;  // guards all that follows
-  Deliveries deliveries_;
-  ClientOutbox outbox_;
-  ClientThread thread_;
-  WakeEvent event_;
-  bool isSleeping_ = false;
-  bool isWoken_ = false;
+  mutable Mutex mutex_;
+  Deliveries deliveries_ GUARDED_BY(mutex_);
+  ClientOutbox outbox_ GUARDED_BY(mutex_);
+  ClientThread thread_ GUARDED_BY(mutex_);
+  WakeEvent event_ GUARDED_BY(mutex_);
+  bool isSleeping_ GUARDED_BY(mutex_) = false;
+  bool isWoken_ GUARDED_BY(mutex_) = false;
 
-  twr_state state_ = TWR_STATE_IDLE;
+  twr_state state_ GUARDED_BY(mutex_) = TWR_STATE_IDLE;
+  // Only the thread uses the socket, so it reads it without the mutex. It opens and closes it with the mutex
+  // held, so that a fork finds either a whole descriptor or none.
   ClientSocket socket_;
-  RpcStrings texts_{StringInterner(64, 64), StringInterner(64, 32)};
-  std::optional<RpcFrameReader> reader_;
-  bool isReadable_ = false;
-  bool awaitsRoom_ = false;  // the kernel takes no more for now
-  bool hasEndedSending_ = false;
-  bool hasAnswered_ = false;
-  Clock::time_point connectedAt_;
+  RpcStrings texts_ GUARDED_BY(mutex_){StringInterner(64, 64), StringInterner(64, 32)};
+  std::optional<RpcFrameReader> reader_ GUARDED_BY(mutex_);
+  bool isReadable_ GUARDED_BY(mutex_) = false;
+  bool awaitsRoom_ GUARDED_BY(mutex_) = false;  // the kernel takes no more for now
+  bool hasEndedSending_ GUARDED_BY(mutex_) = false;
+  bool hasAnswered_ GUARDED_BY(mutex_) = false;
+  Clock::time_point connectedAt_ GUARDED_BY(mutex_);
 
-  Backoff backoff_;
-  Clock::time_point nextAttempt_;
-  std::vector<std::shared_ptr<Waiter>> connectWaiters_;
+  Backoff backoff_ GUARDED_BY(mutex_);
+  Clock::time_point nextAttempt_ GUARDED_BY(mutex_);
+  std::vector<std::shared_ptr<Waiter>> connectWaiters_ GUARDED_BY(mutex_);
 
-  bool isEnding_ = false;
-  bool isAbandoned_ = false;
-  bool isDetached_ = false;
-  bool hasFinished_ = false;
-  bool isBeingJoined_ = false;
-  std::condition_variable joined_;
-  bool isHopeless_ = false;  // ending, and nobody is there
-  Clock::time_point endBy_;
+  bool isEnding_ GUARDED_BY(mutex_) = false;
+  bool isAbandoned_ GUARDED_BY(mutex_) = false;
+  bool isDetached_ GUARDED_BY(mutex_) = false;
+  bool hasFinished_ GUARDED_BY(mutex_) = false;
+  bool isBeingJoined_ GUARDED_BY(mutex_) = false;
+  Condition joined_;
+  bool isHopeless_ GUARDED_BY(mutex_) = false;  // ending, and nobody is there
+  Clock::time_point endBy_ GUARDED_BY(mutex_);
 
-  std::uint64_t seenRingMessages_ = 0;
-  std::chrono::milliseconds ringPoll_;
+  std::uint64_t seenRingMessages_ GUARDED_BY(mutex_) = 0;
+  std::chrono::milliseconds ringPoll_ GUARDED_BY(mutex_);
 
-  int lastError_ = 0;
-  std::string socketPath_;
-  std::uint64_t connections_ = 0;
+  int lastError_ GUARDED_BY(mutex_) = 0;
+  std::string socketPath_ GUARDED_BY(mutex_);
+  std::uint64_t connections_ GUARDED_BY(mutex_) = 0;
 };
 
 }  // namespace tonewerk

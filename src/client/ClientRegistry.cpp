@@ -3,34 +3,37 @@
 
 #include <chrono>
 #include <memory>
-#include <mutex>
 #include <pthread.h>
+#include <type_traits>
 #include <utility>
+
+#include "values/Mutex.h"
 
 namespace tonewerk::clientRegistry {
 namespace {
 
-// Nothing here is ever constructed or destroyed: other objects of the program's may outlive any order.
-constinit std::mutex mutex;
-constinit ClientEngine* first = nullptr;  // the others by their links
-constinit bool isForkObserved = false;
+// None of these objects has a constructor or destructor that runs: other objects of the program may use them
+// at any time before and after main().
+static_assert(std::is_trivially_destructible_v<Mutex>);
+constinit Mutex mutex;
+constinit ClientEngine* first GUARDED_BY(mutex) = nullptr;  // the others by their links
+constinit bool isForkObserved GUARDED_BY(mutex) = false;
 
 // Whoever forks holds all locks meanwhile, so that the child finds nothing half done, and can open them.
-void beforeFork() {
+void beforeFork() ACQUIRE(mutex) {
   mutex.lock();
   for (ClientEngine* engine = first; engine != nullptr; engine = engine->nextClient) engine->beforeFork();
 }
 
-void afterForkInParent() {
-  for (ClientEngine* engine = first; engine != nullptr; engine = engine->nextClient) engine->afterFork();
+void afterForkInParent() RELEASE(mutex) {
+  for (ClientEngine* engine = first; engine != nullptr; engine = engine->nextClient)
+    engine->afterForkInParent();
   mutex.unlock();
 }
 
-void afterForkInChild() {
-  for (ClientEngine* engine = first; engine != nullptr; engine = engine->nextClient) {
-    engine->becomeForked();
-    engine->afterFork();
-  }
+void afterForkInChild() RELEASE(mutex) {
+  for (ClientEngine* engine = first; engine != nullptr; engine = engine->nextClient)
+    engine->afterForkInChild();
   mutex.unlock();
 }
 
@@ -40,9 +43,9 @@ struct HeldClient {
   std::shared_ptr<void> owner;
 };
 
-template <class Condition>
-HeldClient firstOf(Condition isWanted) {
-  const std::lock_guard lock(mutex);
+template <class Predicate>
+HeldClient firstOf(Predicate isWanted) {
+  const MutexLock lock(mutex);
   for (ClientEngine* engine = first; engine != nullptr; engine = engine->nextClient)
     if (isWanted(*engine)) return {engine, engine->owner};
   return {};
@@ -58,7 +61,7 @@ __attribute__((destructor)) void endThreads() {
 }  // namespace
 
 bool add(ClientEngine& engine) {
-  const std::lock_guard lock(mutex);
+  const MutexLock lock(mutex);
   if (!isForkObserved) {
     if (::pthread_atfork(beforeFork, afterForkInParent, afterForkInChild) != 0) return false;
     isForkObserved = true;
@@ -69,7 +72,7 @@ bool add(ClientEngine& engine) {
 }
 
 std::shared_ptr<void> remove(ClientEngine& engine) {
-  const std::lock_guard lock(mutex);
+  const MutexLock lock(mutex);
   for (ClientEngine** link = &first; *link != nullptr; link = &(*link)->nextClient) {
     if (*link != &engine) continue;
     *link = engine.nextClient;

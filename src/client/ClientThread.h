@@ -7,8 +7,8 @@ namespace tonewerk {
 
 // A thread with a name and without signals, which are the program's business.
 //
-// Not std::thread: in a child process the object is there and the thread is not, and then nothing must be
-// done about it.
+// This is not a std::thread because a forked child process has the object but not the thread, and must be
+// able to drop the object then. A copy stands for the same thread.
 class ClientThread {
  public:
   using Function = void (*)(void* argument);
@@ -18,7 +18,7 @@ class ClientThread {
   bool isRunning() const { return isRunning_; }
   bool isThisThread() const { return isRunning_ && ::pthread_equal(thread_, ::pthread_self()) != 0; }
   // Waits for the thread's end; isRunning() stays. Once, and any thread but this one.
-  void join() { ::pthread_join(thread_, nullptr); }
+  void join() const { ::pthread_join(thread_, nullptr); }
   // After join(), or in a child process.
   void forget() { isRunning_ = false; }
 

@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <condition_variable>
 #include <cstddef>
 #include <cstdint>
 #include <list>
@@ -13,20 +12,21 @@
 #include "client/ReplyTable.h"
 #include "client/SessionState.h"
 #include "tonewerk/reporting.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
 // A caller that waits, under the engine's mutex. It is shared, because a caller that forks away leaves one
 // behind that must never be destroyed: it still has a waiter.
 struct Waiter {
-  std::condition_variable condition;
+  Condition condition;
   bool isDone = false;
   twr_status status = TWR_OK;
 
   void finish(twr_status result) {
     isDone = true;
     status = result;
-    condition.notify_all();
+    condition.notifyAll();
   }
 };
 

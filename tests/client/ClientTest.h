@@ -1,14 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <condition_variable>
+#include <chrono>
 #include <cstddef>
 #include <cstdint>
 #include <deque>
 #include <functional>
 #include <gtest/gtest.h>
 #include <memory>
-#include <mutex>
 #include <string>
 #include <utility>
 #include <vector>
@@ -18,6 +17,7 @@
 #include "client/TestPayload.h"
 #include "support/TemporaryDirectory.h"
 #include "tonewerk/reporting.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -29,7 +29,7 @@ class AnswerLog {
  public:
   // A context by which answers are known. Valid as long as this object.
   void* as(std::string name, std::function<void(const twr_answer&)> also = nullptr) {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     names_.push_back({this, std::move(name), std::move(also)});
     return &names_.back();
   }
@@ -44,22 +44,24 @@ class AnswerLog {
 
   // The next answer that was not asked for yet; a test failure when none comes.
   std::string next() {
-    std::unique_lock lock(mutex_);
-    const bool isThere = changed_.wait_for(lock, std::chrono::milliseconds(kScriptPatienceMs),
-                                           [&] { return taken_ < answers_.size(); });
+    const auto until = std::chrono::steady_clock::now() + std::chrono::milliseconds(kScriptPatienceMs);
+    MutexLock lock(mutex_);
+    while (taken_ == answers_.size() && changed_.waitUntil(lock, until)) {
+    }
+    const bool isThere = taken_ < answers_.size();
     EXPECT_TRUE(isThere) << "no answer";
     return isThere ? answers_[taken_++] : std::string();
   }
   std::vector<std::string> rest() {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     std::vector<std::string> rest(answers_.begin() + static_cast<std::ptrdiff_t>(taken_), answers_.end());
     taken_ = answers_.size();
     return rest;
   }
   void add(std::string answer) {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     answers_.push_back(std::move(answer));
-    changed_.notify_all();
+    changed_.notifyAll();
   }
 
  private:
@@ -69,11 +71,11 @@ class AnswerLog {
     std::function<void(const twr_answer&)> also;
   };
 
-  std::mutex mutex_;
-  std::condition_variable changed_;
-  std::vector<std::string> answers_;
-  std::size_t taken_ = 0;
-  std::deque<Name> names_;
+  Mutex mutex_;
+  Condition changed_;
+  std::vector<std::string> answers_ GUARDED_BY(mutex_);
+  std::size_t taken_ GUARDED_BY(mutex_) = 0;
+  std::deque<Name> names_ GUARDED_BY(mutex_);
 };
 
 // A client of a scripted daemon, by the C interface, whose delays are short.

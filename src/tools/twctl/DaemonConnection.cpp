@@ -4,7 +4,6 @@
 #include <algorithm>
 #include <cstdint>
 #include <deque>
-#include <mutex>
 #include <poll.h>
 #include <utility>
 
@@ -12,6 +11,7 @@
 #include "platform/linux/descriptors/WakeEvent.h"
 #include "platform/linux/messagepack/RpcValueReader.h"
 #include "tonewerk/reporting.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 namespace {
@@ -63,20 +63,20 @@ class DaemonConnection::Inbox {
       read.result =
           readValue({static_cast<const char*>(answer.result), answer.result_size}, ValuePlace::kResult);
     }
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     arrived_.push_back({std::move(handler), std::move(read)});
     event_.signal();
   }
 
   void end() {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     isGone_ = true;
     event_.signal();
   }
 
   // Does not wait, whatever it says: kTimedOut is that there is nothing.
   Wait state() {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     if (!arrived_.empty()) return Wait::kArrived;
     return isGone_ ? Wait::kGone : Wait::kTimedOut;
   }
@@ -93,7 +93,7 @@ class DaemonConnection::Inbox {
   }
 
   std::deque<Arrival> takeAll() {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     // A connection that is gone stays readable.
     if (!isGone_) event_.clear();
     return std::exchange(arrived_, {});
@@ -103,9 +103,9 @@ class DaemonConnection::Inbox {
   static constexpr milliseconds::rep kLongestPollMs = 60'000;
 
   WakeEvent event_;
-  std::mutex mutex_;  // guards what follows
-  std::deque<Arrival> arrived_;
-  bool isGone_ = false;
+  Mutex mutex_;
+  std::deque<Arrival> arrived_ GUARDED_BY(mutex_);
+  bool isGone_ GUARDED_BY(mutex_) = false;
 };
 
 // The library's client.

@@ -1,11 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include <condition_variable>
 #include <cstdint>
 #include <map>
 #include <memory>
-#include <mutex>
 #include <optional>
 #include <set>
 #include <string>
@@ -18,6 +16,7 @@
 #include "platform/linux/socket/UnixSocketListener.h"
 #include "protocol/Requests.h"
 #include "support/memory/MemoryLog.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -51,7 +50,7 @@ class ScriptedDaemon {
   void refuse(const std::string& method, ReplyError error) { errors_[method] = std::move(error); }
 
   std::vector<Request> requests() const {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     return requests_;
   }
   std::vector<Request> requestsFor(const std::string& method) const {
@@ -87,16 +86,16 @@ class ScriptedDaemon {
   };
 
   void end() {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     ends_ = true;
-    ending_.notify_one();
+    ending_.notifyOne();
   }
 
   // The listener cannot be ended on its own thread, where the kill request arrives.
   void waitForTheEnd() {
     {
-      std::unique_lock lock(mutex_);
-      ending_.wait(lock, [this] { return ends_; });
+      MutexLock lock(mutex_);
+      while (!ends_) ending_.wait(lock);
     }
     listener_->shutDown();
   }
@@ -104,7 +103,7 @@ class ScriptedDaemon {
   void handle(const std::string& method, Arguments arguments, const Reply& reply) {
     const std::int64_t first = arguments.empty() || !arguments[0] ? 0 : arguments[0]->integer();
     {
-      const std::lock_guard lock(mutex_);
+      const MutexLock lock(mutex_);
       requests_.push_back({method, std::move(arguments)});
     }
     if (sessions_ && method == "reporterIDValid") {
@@ -124,11 +123,10 @@ class ScriptedDaemon {
   std::map<std::string, Value> results_;
   std::map<std::string, ReplyError> errors_;
   std::optional<std::set<std::int64_t>> sessions_;
-  mutable std::mutex mutex_;
-  std::condition_variable ending_;
-  // Guarded by mutex_.
-  std::vector<Request> requests_;
-  bool ends_ = false;
+  mutable Mutex mutex_;
+  Condition ending_;
+  std::vector<Request> requests_ GUARDED_BY(mutex_);
+  bool ends_ GUARDED_BY(mutex_) = false;
 
   Delegate delegate_{*this};
   std::optional<UnixSocketListener> listener_;
