@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <array>
+#include <cassert>
 #include <cerrno>
 #include <limits>
 #include <new>
@@ -215,6 +216,7 @@ void ClientEngine::run() {
 }
 
 void ClientEngine::work() {
+  assert(thread_.isThisThread());
   if (state_ == TWR_STATE_ENDED) return;
   if (!socket_.isOpen() && Clock::now() >= nextAttempt_) attempt();
   if (!socket_.isOpen()) return;
@@ -229,6 +231,7 @@ bool ClientEngine::isDone() const {
 }
 
 void ClientEngine::finish() {
+  assert(thread_.isThisThread());
   const bool isLetGo = socket_.isOpen();
   socket_.close();
   if (isAbandoned_) {
