@@ -63,7 +63,7 @@ class ClientEngine {
   // Calls `ask` with the outbox and makes sure that what it put there goes out. TWR_FORKED, TWR_NOT_CONNECTED
   // when the client has ended, TWR_NO_MEMORY, or what `ask` returns.
   template <class Ask>
-  twr_status request(Ask ask) {
+  [[nodiscard]] twr_status request(Ask ask) {
     if (hasForked_.load(std::memory_order_relaxed)) return TWR_FORKED;
     const MutexLock lock(mutex_);
     if (state_ == TWR_STATE_ENDED) return TWR_NOT_CONNECTED;
@@ -71,21 +71,23 @@ class ClientEngine {
   }
   // The same for what must be done whether the client has ended or not, or has forked away.
   template <class Do>
-  auto withOutbox(Do function) {
+  [[nodiscard]] auto withOutbox(Do function) {
     const MutexLock lock(mutex_);
     auto result = function(outbox_);
-    if (state_ != TWR_STATE_ENDED) ensureRunning();
+    // Without a thread the function has done its work all the same. The next call tries to start the thread
+    // again.
+    if (state_ != TWR_STATE_ENDED) (void)ensureRunning();
     return result;
   }
 
   // Not inside a callback, which would wait for itself: TWR_WOULD_WAIT.
-  twr_status connect(std::chrono::milliseconds timeout);
-  twr_status flush(std::chrono::milliseconds timeout);
+  [[nodiscard]] twr_status connect(std::chrono::milliseconds timeout);
+  [[nodiscard]] twr_status flush(std::chrono::milliseconds timeout);
   // Sends what is queued, within the time, and ends the thread. Nothing is called after it has returned.
   void end(std::chrono::milliseconds timeout);
   // The same inside one of this client's callbacks, where it cannot be waited for: answers still come, states
   // do not, and the registry buries the client later. False, with nothing done, anywhere else.
-  bool endByItself(std::chrono::milliseconds timeout);
+  [[nodiscard]] bool endByItself(std::chrono::milliseconds timeout);
 
   twr_client_info info() const;
   const std::atomic<bool>& hasForked() const { return hasForked_; }
@@ -111,10 +113,10 @@ class ClientEngine {
   using Clock = std::chrono::steady_clock;
 
   // Called by callers. False when there can be no thread.
-  bool ensureRunning() REQUIRES(mutex_);
+  [[nodiscard]] bool ensureRunning() REQUIRES(mutex_);
   void wake() REQUIRES(mutex_);
-  twr_status await(MutexLock& lock, const std::shared_ptr<Waiter>& waiter, std::chrono::milliseconds timeout)
-      REQUIRES(mutex_);
+  [[nodiscard]] twr_status await(MutexLock& lock, const std::shared_ptr<Waiter>& waiter,
+                                 std::chrono::milliseconds timeout) REQUIRES(mutex_);
   void beginToEnd(std::chrono::milliseconds timeout) REQUIRES(mutex_);
   void joinThread(MutexLock& lock) REQUIRES(mutex_);
 
@@ -126,7 +128,7 @@ class ClientEngine {
   bool isDone() const REQUIRES(mutex_);
   void connected(const std::string& path) REQUIRES(mutex_);
   void attemptFailed(int error) REQUIRES(mutex_);
-  bool decode(std::string_view bytes) REQUIRES(mutex_);
+  [[nodiscard]] bool decode(std::string_view bytes) REQUIRES(mutex_);
   void connectionLost(int error) REQUIRES(mutex_);
   // Why answers that are still to come will not.
   twr_status whyUnanswered() const REQUIRES(mutex_) {
@@ -140,7 +142,7 @@ class ClientEngine {
   void work() REQUIRES(mutex_);
   void finish() REQUIRES(mutex_);
   void attempt() REQUIRES(mutex_);
-  int connectTo(const std::string& path) REQUIRES(mutex_);
+  [[nodiscard]] int connectTo(const std::string& path) REQUIRES(mutex_);
   void transmit() REQUIRES(mutex_);
   void receive() REQUIRES(mutex_);
   // False when there was nothing to call.

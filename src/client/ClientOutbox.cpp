@@ -74,7 +74,8 @@ std::shared_ptr<twr_session> ClientOutbox::addSession(ClientEngine& engine, std:
   auto session = std::make_shared<twr_session>(engine, reporterID);
   sessions_.push_back(session);
   ++liveSessions_;
-  if (!hasEnded_) change(*session, {}, {});
+  // Without a reply, a change that is not a configuration always succeeds.
+  if (!hasEnded_) (void)change(*session, {}, {});
   return session;
 }
 
@@ -391,7 +392,8 @@ void ClientOutbox::disconnected(twr_status why) {
 
 void ClientOutbox::takeBack(OutgoingFrame frame) {
   if (frame.origin == OutgoingFrame::Origin::kRecreation) return;
-  if (frame.identifier != 0) replies_.take(frame.identifier);
+  // The reply itself is in the command, which waits for it again in the queue.
+  if (frame.identifier != 0) (void)replies_.take(frame.identifier);
   if (frame.command.session != nullptr) {
     ToldLosses& told = frame.command.session->told;
     told.counted = frame.toldBefore;

@@ -48,23 +48,24 @@ class ClientOutbox {
   // ---- callers ----
 
   // Null when there are too many.
-  std::shared_ptr<twr_session> addSession(ClientEngine& engine, std::int64_t reporterID);
+  [[nodiscard]] std::shared_ptr<twr_session> addSession(ClientEngine& engine, std::int64_t reporterID);
   // TWR_FULL, only where there is a reply: it will not be called, for want of room; the change is made all
   // the same. One that finds no room itself is not lost, either: what the session has become is told once
   // there is room again.
-  twr_status change(twr_session& session, SessionChange change, PendingReply reply);
+  [[nodiscard]] twr_status change(twr_session& session, SessionChange change, PendingReply reply);
   // The same with a destroying change; the session's senders are closed.
-  twr_status destroy(twr_session& session, PendingReply reply);
+  [[nodiscard]] twr_status destroy(twr_session& session, PendingReply reply);
   // A message, to a session or (null) to `reporterIDs`. TWR_FULL: dropped and counted.
-  twr_status send(twr_session* session, const RingMessage& message, std::span<const std::int64_t> reporterIDs,
-                  PendingReply reply);
-  twr_status request(std::string body, PendingReply reply);
+  [[nodiscard]] twr_status send(twr_session* session, const RingMessage& message,
+                                std::span<const std::int64_t> reporterIDs, PendingReply reply);
+  [[nodiscard]] twr_status request(std::string body, PendingReply reply);
   // Finishes `waiter` when everything before has gone out, or when that failed.
   void addBarrier(std::shared_ptr<Waiter> waiter);
   void removeBarrier(const Waiter& waiter) { queue_.removeBarrier(waiter); }
   // Null when there are too many.
-  std::shared_ptr<twr_sender> openSender(twr_session& session, const std::atomic<bool>& hasForked,
-                                         std::size_t ringBytes);
+  [[nodiscard]] std::shared_ptr<twr_sender> openSender(twr_session& session,
+                                                       const std::atomic<bool>& hasForked,
+                                                       std::size_t ringBytes);
   void closeSender(twr_sender& sender);
 
   // ---- the thread ----
@@ -92,7 +93,7 @@ class ClientOutbox {
   std::uint64_t ringMessages() const { return ringMessages_; }
 
  private:
-  bool acceptReply(bool isStart);
+  [[nodiscard]] bool acceptReply(bool isStart);
   Command& add(Command command);
   void reconcileLater(twr_session& session);
   void forgetIfGone(twr_session& session);
@@ -111,14 +112,14 @@ class ClientOutbox {
   bool hasRingData() const;
   void close(twr_sender& sender);
   void drainQuietRings();
-  bool drainMarks(Command& command);
-  bool drain(twr_sender& sender, std::uint64_t position);
+  [[nodiscard]] bool drainMarks(Command& command);
+  [[nodiscard]] bool drain(twr_sender& sender, std::uint64_t position);
   void finish(twr_sender& sender);
   void appendFromRing(twr_session& session, const RingMessage& message, Command::Kind kind);
   void appendLoss(twr_session& session, std::uint64_t lostBefore);
   void absorbClosedRings();
   void absorb(twr_sender& sender);
-  bool absorbUpTo(twr_sender& sender, std::uint64_t position, CommandQueue::Iterator place);
+  [[nodiscard]] bool absorbUpTo(twr_sender& sender, std::uint64_t position, CommandQueue::Iterator place);
   void absorbLoss(twr_sender& sender, CommandQueue::Iterator place);
   void insert(CommandQueue::Iterator place, twr_session& session, Command command);
   void loseBefore(CommandQueue::Iterator place, twr_session& session, std::uint64_t lost);

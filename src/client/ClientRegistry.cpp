@@ -85,7 +85,7 @@ void reapDetached() {
   const auto isDead = [](const ClientEngine& engine) { return engine.isReapable(); };
   for (HeldClient client = firstOf(isDead); client.engine != nullptr; client = firstOf(isDead)) {
     client.engine->end(std::chrono::milliseconds::zero());
-    remove(*client.engine);
+    remove(*client.engine).reset();
   }
 }
 

@@ -22,8 +22,8 @@ std::vector<std::string> defaultSocketPaths();
 class ClientSocket {
  public:
   // 0 or an errno. After open(), whatever it returned, the object may be used and closed.
-  int open();
-  int connect(const std::string& path);
+  [[nodiscard]] int open();
+  [[nodiscard]] int connect(const std::string& path);
 
   int fileDescriptor() const { return socket_.get(); }
   bool isOpen() const { return static_cast<bool>(socket_); }
@@ -33,8 +33,8 @@ class ClientSocket {
     int error = 0;       // an errno; EAGAIN when the socket is not ready
     bool isEnd = false;  // of receive(): the daemon has closed its end
   };
-  Transfer send(std::string_view bytes);
-  Transfer receive(char* into, std::size_t size);
+  [[nodiscard]] Transfer send(std::string_view bytes);
+  [[nodiscard]] Transfer receive(char* into, std::size_t size);
 
   // No more is sent; what the daemon says can still be received.
   void endSending();

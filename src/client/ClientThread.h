@@ -14,7 +14,7 @@ class ClientThread {
   using Function = void (*)(void* argument);
 
   // False when there can be no thread. Once.
-  bool start(const char* name, Function function, void* argument);
+  [[nodiscard]] bool start(const char* name, Function function, void* argument);
   bool isRunning() const { return isRunning_; }
   bool isThisThread() const { return isRunning_ && ::pthread_equal(thread_, ::pthread_self()) != 0; }
   // Waits for the thread's end; isRunning() stays. Once, and any thread but this one.

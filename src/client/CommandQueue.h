@@ -90,13 +90,13 @@ class CommandQueue {
   // Counts nothing: what comes back has never stopped counting.
   void putBack(Command command);
   // The first. It goes on counting until released().
-  Command take();
+  [[nodiscard]] Command take();
   void released(std::size_t bytes) { bytes_ -= bytes; }
   // One that is here, and counts no longer.
   void remove(const Command& command);
   // The one that `waiter` waits for, if it is still here.
   void removeBarrier(const Waiter& waiter);
-  std::list<Command> takeAll();
+  [[nodiscard]] std::list<Command> takeAll();
 
   Iterator begin() { return commands_.begin(); }
   Iterator end() { return commands_.end(); }

@@ -83,10 +83,10 @@ class MessageRing {
 
   // Producer. TWR_OK; TWR_FULL for now; TWR_TOO_LARGE for ever; TWR_INVALID for a list; the payload's
   // problem. Whatever is not taken counts as dropped.
-  twr_status push(std::uint32_t category, std::uint16_t type, const twr_payload& payload);
+  [[nodiscard]] twr_status push(std::uint32_t category, std::uint16_t type, const twr_payload& payload);
 
   // Consumer. The oldest message, and the same again until pop(); its bytes are valid until then.
-  std::optional<RingMessage> front();
+  [[nodiscard]] std::optional<RingMessage> front();
   // Consumer, after front() gave one.
   void pop();
 
@@ -99,7 +99,7 @@ class MessageRing {
  private:
   struct Header;
 
-  twr_status drop(std::uint32_t category, twr_status why);
+  [[nodiscard]] twr_status drop(std::uint32_t category, twr_status why);
   bool hasRoom(std::uint64_t written, std::size_t bytes);
   void copyIn(std::uint64_t position, const void* from, std::size_t size);
   void copyOut(std::uint64_t position, void* to, std::size_t size) const;

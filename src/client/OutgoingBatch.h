@@ -55,10 +55,10 @@ class OutgoingBatch {
   void add(OutgoingFrame frame);
 
   // The kernel has taken so many bytes more. The frames that have thereby gone out, in order.
-  std::vector<OutgoingFrame> sent(std::size_t count);
+  [[nodiscard]] std::vector<OutgoingFrame> sent(std::size_t count);
 
   // The frames that have not gone out, in order; those of rings with their bodies. Nothing is left.
-  std::vector<OutgoingFrame> takeBack();
+  [[nodiscard]] std::vector<OutgoingFrame> takeBack();
 
  private:
   struct Entry {

@@ -15,7 +15,7 @@ namespace tonewerk {
 inline constexpr std::uint32_t kPayloadIsList = 1;
 
 // Why a message or a configuration cannot be made of `payload`; TWR_OK for nothing.
-inline twr_status problemOfMap(const twr_payload& payload) {
+[[nodiscard]] inline twr_status problemOfMap(const twr_payload& payload) {
   const twr_status problem = twr_payload_problem(&payload);
   if (problem != TWR_OK) return problem;
   return (payload.flags & kPayloadIsList) == 0 ? TWR_OK : TWR_INVALID;
@@ -27,6 +27,6 @@ void appendRequestBody(std::string& out, std::string_view method, const twr_payl
 
 // A payload's entries as a map; none when they are not what the protocol carries, which only happens when
 // somebody else wrote into the payload's memory.
-std::optional<ValueMap> mapOf(const twr_payload& payload);
+[[nodiscard]] std::optional<ValueMap> mapOf(const twr_payload& payload);
 
 }  // namespace tonewerk

@@ -44,11 +44,11 @@ class ReplyTable {
   };
 
   // The identifier that the request is to be sent with.
-  std::uint32_t add(Entry entry);
+  [[nodiscard]] std::uint32_t add(Entry entry);
   // None when nobody waits: an answer to nothing, or the second of two.
-  std::optional<Entry> take(std::uint32_t identifier);
+  [[nodiscard]] std::optional<Entry> take(std::uint32_t identifier);
   // In the order of the requests. A new connection begins anew.
-  std::vector<Entry> takeAll();
+  [[nodiscard]] std::vector<Entry> takeAll();
 
   // Somebody waits for an answer that the daemon gives as soon as it can.
   bool hasAwaited() const;

@@ -62,8 +62,8 @@ class RpcClient {
 
   // Sends a request and waits for its answer; handlers of others that arrive before it run. None on failure
   // or after `timeout`; `error` says which.
-  std::optional<Answer> call(std::string_view method, const Arguments& arguments,
-                             std::chrono::milliseconds timeout, std::error_code& error) {
+  [[nodiscard]] std::optional<Answer> call(std::string_view method, const Arguments& arguments,
+                                           std::chrono::milliseconds timeout, std::error_code& error) {
     using std::chrono::milliseconds;
     const auto until = std::chrono::steady_clock::now() + timeout;
     // Shared, because after a time-out the answer may still come.
@@ -86,7 +86,7 @@ class RpcClient {
   // Waits up to `timeout` for something to arrive, and says by arrive() which answers did.
   // std::errc::timed_out when nothing came; std::errc::not_connected, or why the connection is of no more
   // use.
-  virtual std::error_code receive(std::chrono::milliseconds timeout) = 0;
+  [[nodiscard]] virtual std::error_code receive(std::chrono::milliseconds timeout) = 0;
   void arrive(Arrival arrival) { arrived_.push_back(std::move(arrival)); }
   bool hasArrivals() const { return !arrived_.empty(); }
   // The connection ends, and with it what came over it. Also inside a handler, which is then the last one.

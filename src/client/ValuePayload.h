@@ -13,10 +13,10 @@
 
 namespace tonewerk {
 
-inline twr_status putValue(twr_payload* payload, const char* name, const Value& value);
+[[nodiscard]] inline twr_status putValue(twr_payload* payload, const char* name, const Value& value);
 
 // TWR_INVALID for a name with a zero byte in it, which the C interface could only cut off.
-inline twr_status putEntries(twr_payload* payload, const ValueMap& map) {
+[[nodiscard]] inline twr_status putEntries(twr_payload* payload, const ValueMap& map) {
   for (const ValueMapEntry& entry : map) {
     const std::string name(entry.key);
     if (name.find('\0') != std::string::npos) return TWR_INVALID;
@@ -26,7 +26,7 @@ inline twr_status putEntries(twr_payload* payload, const ValueMap& map) {
   return TWR_OK;
 }
 
-inline twr_status putElements(twr_payload* payload, const ValueArray& array) {
+[[nodiscard]] inline twr_status putElements(twr_payload* payload, const ValueArray& array) {
   for (const Value& element : array) {
     if (const twr_status status = putValue(payload, nullptr, element); status != TWR_OK) return status;
   }
@@ -34,7 +34,7 @@ inline twr_status putElements(twr_payload* payload, const ValueArray& array) {
 }
 
 // Puts `value` and all that it holds. After a failure containers may be open.
-inline twr_status putValue(twr_payload* payload, const char* name, const Value& value) {
+[[nodiscard]] inline twr_status putValue(twr_payload* payload, const char* name, const Value& value) {
   twr_status status = TWR_OK;
   switch (value.kind()) {
     case Value::Kind::kBoolean:
@@ -95,7 +95,7 @@ class ValuePayload {
   static constexpr std::size_t kMaxBytes = std::size_t{2} << 20;  // no frame of the protocol holds as much
 
   template <class Fill>
-  twr_status fill(Fill once) {
+  [[nodiscard]] twr_status fill(Fill once) {
     twr_status status = once();
     while (status == TWR_TOO_LARGE && memory_.size() < kMaxBytes) {
       memory_.resize(memory_.size() * 2);

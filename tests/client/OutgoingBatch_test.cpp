@@ -51,7 +51,7 @@ TEST_F(OutgoingBatchTest, LetsGoOfAFrameWithoutBytesAfterThoseBeforeIt) {
 TEST_F(OutgoingBatchTest, GivesARingsMessageBackWithItsBody) {
   add("##one", 1, OutgoingFrame::Origin::kRing);
   add("##two", 2, OutgoingFrame::Origin::kRing);
-  batch.sent(6);
+  EXPECT_EQ(batch.sent(6).size(), 1U);
   const std::vector<OutgoingFrame> back = batch.takeBack();
   ASSERT_EQ(back.size(), 1U);
   EXPECT_EQ(back[0].command.body, "two");
@@ -62,7 +62,7 @@ TEST_F(OutgoingBatchTest, IsFullAtItsBound) {
   EXPECT_FALSE(batch.isFull());
   add("x", 2);
   EXPECT_TRUE(batch.isFull());
-  batch.sent(OutgoingBatch::kFullBytes);
+  EXPECT_EQ(batch.sent(OutgoingBatch::kFullBytes).size(), 2U);
   EXPECT_FALSE(batch.isFull());
 }
 

@@ -24,7 +24,7 @@ TEST(ReplyTableTest, GivesAllInTheOrderOfTheRequests) {
   ReplyTable table;
   std::vector<AnswerKind> kinds;
   for (const AnswerKind kind : {AnswerKind::kReporters, AnswerKind::kPlain, AnswerKind::kValidity})
-    table.add(entry(kind));
+    EXPECT_NE(table.add(entry(kind)), 0U);
   for (const ReplyTable::Entry& each : table.takeAll()) kinds.push_back(each.reply.kind);
   EXPECT_THAT(kinds, testing::ElementsAre(AnswerKind::kReporters, AnswerKind::kPlain, AnswerKind::kValidity));
   EXPECT_EQ(table.size(), 0U);

@@ -28,16 +28,16 @@ class DaemonCalls {
   enum class Role { kClient, kOnlooker };
 
   // False when no daemon listens.
-  bool connect(Role role);
+  [[nodiscard]] bool connect(Role role);
 
   // The answer's result (none for nil) in `result`. False when the request was refused or not answered.
-  bool call(std::string_view method, const Arguments& arguments, std::optional<Value>& result);
+  [[nodiscard]] bool call(std::string_view method, const Arguments& arguments, std::optional<Value>& result);
 
   // The same for an answer that may be long in coming, with nothing printed: `waitReadable` waits until the
   // descriptor is readable, or says false to give up. None, then or with a `failure`.
-  std::optional<Value> await(std::string_view method, const Arguments& arguments,
-                             const std::function<bool(int descriptor)>& waitReadable,
-                             std::optional<DaemonFailure>& failure);
+  [[nodiscard]] std::optional<Value> await(std::string_view method, const Arguments& arguments,
+                                           const std::function<bool(int descriptor)>& waitReadable,
+                                           std::optional<DaemonFailure>& failure);
 
   DaemonConnection& client() { return client_; }
 

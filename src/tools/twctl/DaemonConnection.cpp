@@ -49,8 +49,10 @@ class DaemonConnection::Inbox {
  public:
   enum class Wait { kArrived, kGone, kTimedOut };
 
-  Inbox() { event_.open(); }
+  Inbox() : isOpen_(event_.open()) {}
 
+  // False when there was no descriptor left for the event. Nothing can then be waited for.
+  bool isOpen() const { return isOpen_; }
   int fileDescriptor() const { return event_.fileDescriptor(); }
 
   void put(AnswerHandler handler, const twr_answer& answer) {
@@ -103,6 +105,7 @@ class DaemonConnection::Inbox {
   static constexpr milliseconds::rep kLongestPollMs = 60'000;
 
   WakeEvent event_;
+  const bool isOpen_;
   Mutex mutex_;
   std::deque<Arrival> arrived_ GUARDED_BY(mutex_);
   bool isGone_ GUARDED_BY(mutex_) = false;
@@ -178,6 +181,10 @@ std::error_code DaemonConnection::connect(const std::vector<std::string>& paths)
   for (const std::string& path : paths) {
     library_.reset();
     inbox_ = std::make_unique<Inbox>();
+    if (!inbox_->isOpen()) {
+      inbox_.reset();
+      return std::make_error_code(std::errc::too_many_files_open);
+    }
     library_ = std::make_unique<Library>(path, *inbox_);
     const std::error_code error = library_->connect();
     if (!error) return {};

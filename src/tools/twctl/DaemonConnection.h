@@ -31,7 +31,7 @@ class DaemonConnection : public RpcClient {
   class Inbox;
   class Library;
 
-  std::error_code receive(std::chrono::milliseconds timeout) override;
+  [[nodiscard]] std::error_code receive(std::chrono::milliseconds timeout) override;
 
   std::unique_ptr<Inbox> inbox_;  // outlives the library's client, which puts into it
   std::unique_ptr<Library> library_;

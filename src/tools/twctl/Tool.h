@@ -33,7 +33,7 @@ struct Tool {
   int status = kDone;      // of the command that ran
 
   // Prints "twctl: <problem>" and returns `failure`.
-  int fail(ExitStatus failure, std::string_view problem) const;
+  [[nodiscard]] int fail(ExitStatus failure, std::string_view problem) const;
   // Prints "twctl: warning: <problem>": it has been done all the same.
   void warn(std::string_view problem) const;
 

@@ -36,6 +36,6 @@ CLI::App& addCommand(CLI::App& app, Tool& tool, const std::string& name, const s
 void addCommonOptions(CLI::App& app, Tool& tool);
 
 // Reads the command line and runs what it asks for. The exit status.
-int runCommandLine(int argc, const char* const* argv, Tool& tool);
+[[nodiscard]] int runCommandLine(int argc, const char* const* argv, Tool& tool);
 
 }  // namespace tonewerk

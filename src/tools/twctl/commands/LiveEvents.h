@@ -32,14 +32,14 @@ class LiveEvents {
   ~LiveEvents();
 
   // Waits for what comes first: `readable` (-1 for none) to be so, or the time. Once stopped, always stopped.
-  Event wait(int readable, std::optional<Time> until);
+  [[nodiscard]] Event wait(int readable, std::optional<Time> until);
 
   // The last key that wait() told of.
   char key() const { return key_; }
 
  private:
-  std::optional<Event> takeSignal();
-  bool takeKey();
+  [[nodiscard]] std::optional<Event> takeSignal();
+  [[nodiscard]] bool takeKey();
 
   int in_;
   const int out_;

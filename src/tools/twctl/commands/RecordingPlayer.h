@@ -24,14 +24,14 @@ class RecordingPlayer {
 
   // Waits until every request is sent and answered, or the daemon is gone: no error after a request that ends
   // it. A start's answer is not waited for: it only comes with the session's stop.
-  std::error_code play(const Recording& recording);
+  [[nodiscard]] std::error_code play(const Recording& recording);
 
   std::size_t refused() const { return refused_; }
 
  private:
-  std::error_code waitUntil(std::chrono::steady_clock::time_point time);
-  std::error_code waitForAnswers();
-  std::error_code send(const RecordedCall& call);
+  [[nodiscard]] std::error_code waitUntil(std::chrono::steady_clock::time_point time);
+  [[nodiscard]] std::error_code waitForAnswers();
+  [[nodiscard]] std::error_code send(const RecordedCall& call);
   void refuse(const RecordedCall& call, const std::string& why);
 
   DaemonConnection& daemon_;

@@ -79,8 +79,9 @@ void send(Tool& tool, const SendOptions& options) {
   Argument recipients;
   if (!options.reporterIDs.empty())
     recipients = ValueArray(std::vector<Value>(options.reporterIDs.begin(), options.reporterIDs.end()));
-  daemon.call(requests::kSendMessage.name,
-              {Value(std::move(*payload)), Value(*category), Value(*type), recipients}, result);
+  // A failure is already printed and in the tool's status.
+  (void)daemon.call(requests::kSendMessage.name,
+                    {Value(std::move(*payload)), Value(*category), Value(*type), recipients}, result);
 }
 
 }  // namespace

@@ -12,6 +12,7 @@ class DaemonCalls;
 // Asks the daemon for the session of that identifier: its service type in `serviceType`, or none when nobody
 // has it. 0, by which the answer says "nobody", is always found. False when the daemon did not answer, which
 // has then been said.
-bool lookUpSession(DaemonCalls& daemon, ReporterID reporterID, std::optional<AudioServiceType>& serviceType);
+[[nodiscard]] bool lookUpSession(DaemonCalls& daemon, ReporterID reporterID,
+                                 std::optional<AudioServiceType>& serviceType);
 
 }  // namespace tonewerk

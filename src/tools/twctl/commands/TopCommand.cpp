@@ -39,7 +39,7 @@ class TerminalScreen final : public LiveScreen {
   void show(const std::vector<std::string>& lines) override { terminal_.show(lines); }
   double now() const override { return steadyNow(); }
 
-  Event waitUntil(double time) override {
+  [[nodiscard]] Event waitUntil(double time) override {
     const auto until = LiveEvents::Time(
         std::chrono::duration_cast<LiveEvents::Time::duration>(std::chrono::duration<double>(time)));
     for (;;) {
@@ -107,7 +107,7 @@ void printOneFrame(const Tool& tool, DaemonCalls& daemon, double interval) {
   SessionRates rates;
   const auto first = listSessions(ask);
   if (!first) return;
-  rates.rowsOf(*first, steadyNow());
+  rates.rowsOf(*first, steadyNow());  // only to have counts to compare with
   std::this_thread::sleep_for(std::chrono::duration<double>(interval));
   const auto second = listSessions(ask);
   if (second) printFrame(tool, rates.rowsOf(*second, steadyNow()));

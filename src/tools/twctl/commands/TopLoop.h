@@ -24,7 +24,7 @@ class LiveScreen {
   // Seconds of a time that never goes back.
   virtual double now() const = 0;
   // Waits until then, or until something happens before.
-  virtual Event waitUntil(double time) = 0;
+  [[nodiscard]] virtual Event waitUntil(double time) = 0;
 };
 
 // Lists the sessions there are; none when that failed, or somebody has seen enough meanwhile.

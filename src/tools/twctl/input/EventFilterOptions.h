@@ -24,7 +24,7 @@ class EventFilterOptions {
   void addWithoutNameTo(CLI::App& command);
 
   // What they say. None when one is wrong; `tool` has then said so.
-  std::optional<EventFilter> filter(Tool& tool) const;
+  [[nodiscard]] std::optional<EventFilter> filter(Tool& tool) const;
 
  private:
   std::optional<std::string> name_;

@@ -13,7 +13,7 @@ class JsonService;
 
 // Reads a JSON object with one member `parameters`, an array of arguments in which null stands for none, and
 // other members, which become values. What is wrong, or an empty text.
-std::string parseJsonCall(std::string_view line, std::string_view parameters, const JsonService& json,
-                          ValueMap& members, Arguments& arguments);
+[[nodiscard]] std::string parseJsonCall(std::string_view line, std::string_view parameters,
+                                        const JsonService& json, ValueMap& members, Arguments& arguments);
 
 }  // namespace tonewerk

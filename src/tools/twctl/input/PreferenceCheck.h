@@ -12,8 +12,8 @@ namespace tonewerk {
 
 // What the daemon would leave out of a preference that it knows, and why; empty for one that it does not
 // know.
-std::vector<std::string> preferenceProblems(std::string_view domain, std::string_view key,
-                                            const Value& value);
+[[nodiscard]] std::vector<std::string> preferenceProblems(std::string_view domain, std::string_view key,
+                                                          const Value& value);
 
 // "; did you mean 'max_days'?", for a domain or key that the daemon does not know; empty when nothing is
 // close.

@@ -36,8 +36,8 @@ class Recording {
  public:
   // None when a line is not one of the above, or no request that `interface` has; `problem` then says "line
   // 3: why".
-  static std::optional<Recording> read(std::istream& text, const RequestSet& interface,
-                                       const JsonService& json, std::string& problem);
+  [[nodiscard]] static std::optional<Recording> read(std::istream& text, const RequestSet& interface,
+                                                     const JsonService& json, std::string& problem);
 
   const std::vector<RecordedCall>& calls() const { return calls_; }
 

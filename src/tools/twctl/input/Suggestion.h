@@ -12,7 +12,8 @@ namespace tonewerk {
 
 // The name that it takes the fewest changes to get to from `word`; none when it takes too many for a slip.
 // Upper and lower case are the same.
-std::optional<std::string> closestTo(std::string_view word, const std::vector<std::string>& names);
+[[nodiscard]] std::optional<std::string> closestTo(std::string_view word,
+                                                   const std::vector<std::string>& names);
 
 // "did you mean 'events'?"
 std::string didYouMean(const std::string& name);

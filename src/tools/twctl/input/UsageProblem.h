@@ -11,6 +11,6 @@ class ParseError;
 namespace tonewerk {
 
 // What is wrong with the command line that `app` did not take, in one line.
-std::string usageProblem(const CLI::App& app, const CLI::ParseError& error);
+[[nodiscard]] std::string usageProblem(const CLI::App& app, const CLI::ParseError& error);
 
 }  // namespace tonewerk

@@ -26,7 +26,7 @@ class ChannelPrinter {
       : tool_(tool), chanmeter_(chanmeter), filter_(filter) {}
 
   // False when some source could not be read; the others are printed.
-  bool printValues();
+  [[nodiscard]] bool printValues();
 
   // A block of its own: the time, and below it the channels in which something happened since the last call.
   // The first call prints nothing. `at`: seconds since 1970.
@@ -34,7 +34,7 @@ class ChannelPrinter {
 
  private:
   // Null when nothing could be read.
-  Chanmeter::Samples takeSamples(std::optional<ChanmeterError>& error);
+  [[nodiscard]] Chanmeter::Samples takeSamples(std::optional<ChanmeterError>& error);
   // Returns how many were printed.
   std::size_t print(const ChanmeterSamples& samples, std::optional<double> changedAt);
 

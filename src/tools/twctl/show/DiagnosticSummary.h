@@ -24,7 +24,7 @@ struct DiagnosticSummary {
   std::vector<std::pair<std::string, std::string>> problems;  // by file
 
   // None when `text` is no JSON object.
-  static std::optional<DiagnosticSummary> read(DiagnosticKind kind, std::string_view text);
+  [[nodiscard]] static std::optional<DiagnosticSummary> read(DiagnosticKind kind, std::string_view text);
 };
 
 // One line of JSON; "null" when `text` is no JSON.
