@@ -9,7 +9,7 @@
 #include <unistd.h>
 
 #include "platform/linux/descriptors/UnixAddress.h"
-#include "platform/linux/directories/Directories.h"
+#include "platform/linux/directories/SocketPaths.h"
 
 namespace tonewerk {
 namespace {
@@ -23,9 +23,6 @@ ClientSocket::Transfer failure(int error) {
   return transfer;
 }
 
-constexpr const char* kSocketVariable = "TONEWERK_REPORTING_SOCKET";
-constexpr const char* kSocketName = "/reporting.sock";
-
 std::optional<std::string> variable(const std::string& name) {
   const char* value = ::secure_getenv(name.c_str());
   return value == nullptr ? std::nullopt : std::optional<std::string>(value);
@@ -33,13 +30,7 @@ std::optional<std::string> variable(const std::string& name) {
 
 }  // namespace
 
-std::vector<std::string> defaultSocketPaths() {
-  const std::optional<std::string> chosen = variable(kSocketVariable);
-  if (chosen && !chosen->empty()) return {*chosen};
-  const std::string own = Directories::from(variable, ::geteuid()).runtime + kSocketName;
-  const std::string system = Directories::system().runtime + kSocketName;
-  return own == system ? std::vector{system} : std::vector{own, system};
-}
+std::vector<std::string> defaultSocketPaths() { return socketPathsFrom(variable, ::geteuid()); }
 
 int ClientSocket::open() {
   socket_.reset(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));

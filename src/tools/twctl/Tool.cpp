@@ -2,13 +2,19 @@
 #include "tools/twctl/Tool.h"
 
 #include <cstdlib>
+#include <optional>
 #include <ostream>
+#include <unistd.h>
+
+#include "platform/linux/directories/SocketPaths.h"
 
 namespace tonewerk {
 namespace {
 
-constexpr const char* kSocketVariable = "TONEWERK_REPORTING_SOCKET";
-constexpr const char* kSocketName = "/reporting.sock";
+std::optional<std::string> variable(const std::string& name) {
+  const char* value = std::getenv(name.c_str());
+  return value == nullptr ? std::nullopt : std::optional<std::string>(value);
+}
 
 }  // namespace
 
@@ -28,12 +34,8 @@ Directories Tool::directories() const {
 }
 
 std::vector<std::string> Tool::socketPaths() const {
-  const std::string system = Directories::system().runtime + kSocketName;
-  if (systemWide) return {system};
-  if (const char* chosen = std::getenv(kSocketVariable); chosen != nullptr && *chosen != '\0')
-    return {chosen};
-  const std::string own = Directories::fromEnvironment().runtime + kSocketName;
-  return own == system ? std::vector{system} : std::vector{own, system};
+  if (systemWide) return {socketPathOf(Directories::system())};
+  return socketPathsFrom(variable, ::geteuid());
 }
 
 }  // namespace tonewerk
