@@ -7,7 +7,7 @@
 #include <time.h>
 #include <tonewerk/reporting.h>
 
-static void* play(void* sender) { /* a real-time thread: reporting neither locks, allocates nor waits */
+static void* play(void* sender) { /* a real-time thread: the calls do not lock, allocate or wait */
   unsigned char memory[256];
   twr_payload payload;
   for (int cycle = 0; cycle <= 4; cycle++) { /* the last one stops */
@@ -39,7 +39,7 @@ int main(void) {
   twr_client_destroy(client, 1000);
   printf("report: %s\n", twr_status_text(status));
   fflush(stdout);
-  /* Where the store is ours, the report that came of this. */
+  /* Shows the report, if this user may read the store. */
   const char show[] =
       "for try in 1 2 3 4 5 6 7 8 9; do sleep 1; "
       "twctl events --name '*.Volume.Summary' --limit 1 2>/dev/null | grep org.example.Report && break; done";

@@ -9,7 +9,7 @@
 
 namespace tr = tonewerk::reporting;
 
-// A real-time thread: what reports here neither locks, allocates nor waits.
+// Runs on a real-time thread: the calls do not lock, allocate or wait.
 static void play(tr::Sender& sender) {
   for (int cycle = 0; cycle <= 4; ++cycle) {  // the last one stops
     tr::Payload<256> payload;
@@ -36,7 +36,7 @@ static tr::Status report() {
 int main() {
   const tr::Status status = report();
   std::cout << "report: " << tr::text(status) << std::endl;
-  // Where the store is ours, the report that came of this.
+  // Shows the report, if this user may read the store.
   const char show[] =
       "for try in 1 2 3 4 5 6 7 8 9; do sleep 1; "
       "twctl events --name '*.Volume.Summary' --limit 1 2>/dev/null | grep org.example.Report && break; done";

@@ -2,7 +2,8 @@
 #ifndef TONEWERK_REPORTING_HPP
 #define TONEWERK_REPORTING_HPP
 
-// The C interface of tonewerk/reporting.h for C++17 and later; what is not said here is said there.
+// Wraps the C interface of tonewerk/reporting.h for C++17 and later. See there for what is not described
+// here.
 //
 //   namespace tr = tonewerk::reporting;
 //   tr::Client client;
@@ -15,13 +16,13 @@
 //   payload.put("session_output_running", true).put("QMSessionVolume", 0.5);
 //   sender.send(tr::Category::kPlayback, tr::Type::kStart, payload);
 //
-// Objects can be moved and not copied. One whose making failed, or that was moved from, is empty: it converts
-// to false, and its calls do nothing and return Status::kInvalid. A session keeps its client alive and a
-// sender its session, so the order in which they go does not matter.
+// Objects can be moved but not copied. An object is empty when it could not be made or was moved from: it
+// converts to false, and its calls do nothing and return Status::kInvalid. A session keeps its client alive,
+// and a sender keeps its session alive, so they may be destroyed in any order.
 //
-// Nothing here throws; the program ends where it has no memory for what this header itself keeps. A reply
-// runs on the client's background thread. It may do there what twr_reply may, and it may drop the client's
-// last share; an exception that leaves it ends the program.
+// Nothing here throws. The program ends when there is no memory for an object of this header. A reply runs on
+// the client's background thread. The rules of twr_reply apply to it. It may destroy the last object that
+// keeps the client alive. An exception that leaves it ends the program.
 
 #include <chrono>
 #include <cstddef>
@@ -82,7 +83,7 @@ enum class Category : std::uint32_t {
   kUnknown = TWR_CATEGORY_UNKNOWN
 };
 
-// The part of the audio stack that says it: Category::kIO | Domain::kHAL.
+// The part of the audio stack that reports a message, as in Category::kIO | Domain::kHAL.
 enum class Domain : std::uint32_t {
   kMIDI = TWR_DOMAIN_MIDI,
   kSession = TWR_DOMAIN_SESSION,
@@ -138,28 +139,28 @@ enum class Service : std::uint16_t {
   kUnknown = TWR_SERVICE_UNKNOWN
 };
 
-// In English words, for logs.
+// Describes the status in English, for logs.
 inline const char* text(Status status) noexcept { return ::twr_status_text(static_cast<twr_status>(status)); }
 
 inline const char* version() noexcept { return ::twr_version(); }
 
-// A point in time, as distinct from a number. Seconds since 1970 UTC.
+// A point in time in seconds since 1970 UTC. A type of its own, so that it differs from a number.
 struct Date {
   double seconds;
 };
 
 // ---- payloads ----
 
-// What a payload of any size can do: every call puts one entry and gives the payload back for the next. What
-// does not fit, or is not valid text, marks the payload, which is then refused as a whole. For any thread, a
-// real-time one, too; one at a time.
+// Has the functions of a payload of any size. Every call puts one entry and returns the payload for the next
+// call. An entry that does not fit, or is not valid text, marks the payload, which is then refused as a
+// whole. Any thread may use it, also a real-time one, but only one at a time.
 class AnyPayload {
  public:
   AnyPayload(const AnyPayload&) = delete;
   AnyPayload& operator=(const AnyPayload&) = delete;
 
-  // A boolean, any integer, any floating-point number, any text that a std::string_view can be made of, a
-  // Date, or a time of the system's clock.
+  // Puts a boolean, an integer, a floating-point number, a text that converts to a std::string_view, a Date,
+  // or a time of the system's clock.
   template <class T>
   AnyPayload& put(const char* name, const T& value) noexcept {
     using Held = std::decay_t<T>;
@@ -185,13 +186,13 @@ class AnyPayload {
     return *this;
   }
 
-  // Within a list, where values have no names.
+  // Puts a value into a list, where values have no names.
   template <class T>
   AnyPayload& put(const T& value) noexcept {
     return put(nullptr, value);
   }
 
-  // A map, or a list, of what `fill` puts into the payload that it is given. Without a name: within a list.
+  // Put a map or a list. `fill` gets the payload and puts the entries. Without a name: into a list.
   template <class Fill>
   AnyPayload& map(const char* name, Fill&& fill) {
     return nested(::twr_open_map(&payload_, name), std::forward<Fill>(fill));
@@ -209,7 +210,7 @@ class AnyPayload {
     return list(nullptr, std::forward<Fill>(fill));
   }
 
-  // Why it would be refused.
+  // Why the payload would be refused; kOk when it would not.
   Status problem() const noexcept { return static_cast<Status>(::twr_payload_problem(&payload_)); }
 
   const twr_payload* get() const noexcept { return &payload_; }
@@ -230,7 +231,8 @@ class AnyPayload {
   }
 };
 
-// A map of named values, with room for so many bytes; an entry takes its name, its text, and at most 20 more.
+// A map of named values, with room for `Bytes` bytes. An entry takes the bytes of its name and text and at
+// most 20 more.
 template <std::size_t Bytes = 256>
 class Payload final : public AnyPayload {
  public:
@@ -260,21 +262,21 @@ class Parameters final : public AnyPayload {
 
 // ---- answers ----
 
-// What came back for a request; a copy that may be kept.
+// Holds a copy of the answer to a request. It may be kept.
 struct Answer {
   Status status = Status::kNotConnected;
-  std::string errorDomain;  // of Status::kRefused: the daemon's error
+  std::string errorDomain;  // these three: the daemon's error for Status::kRefused
   std::int64_t errorCode = 0;
   std::string errorMessage;
-  std::int64_t reporterID = 0;              // of validate(); 0 when it names no session
-  Service serviceType = Service::kGeneric;  // of validate() and getServiceType()
-  std::vector<std::int64_t> reporterIDs;    // of getAllReporters()
-  std::vector<unsigned char> result;        // as it came: MessagePack
+  std::int64_t reporterID = 0;              // for validate(); 0 when no session has it
+  Service serviceType = Service::kGeneric;  // for validate() and getServiceType()
+  std::vector<std::int64_t> reporterIDs;    // for getAllReporters()
+  std::vector<unsigned char> result;        // as MessagePack
 
   explicit operator bool() const noexcept { return status == Status::kOk; }
 };
 
-// Called once for a request that was taken (Status::kOk). An empty one stands for no answer wanted.
+// Called once for each request that was queued (Status::kOk). Pass an empty one when no answer is wanted.
 using Reply = std::function<void(Answer answer)>;
 
 // ---- inside ----
@@ -307,7 +309,8 @@ inline void runStateChanged(void* context, twr_state state) noexcept {
   (*static_cast<std::function<void(State)>*>(context))(static_cast<State>(state));
 }
 
-// Makes a call with what the C interface takes for `reply`, which belongs to the library once it is taken.
+// Makes a call of the C interface with a function and a context that run `reply`. The library owns the copy
+// of `reply` once the call has succeeded, and this function deletes it otherwise.
 template <class Call>
 Status withReply(Reply&& reply, Call call) noexcept {
   if (!reply) return static_cast<Status>(call(nullptr, nullptr));
@@ -324,19 +327,19 @@ inline int millisecondsOf(std::chrono::milliseconds time) noexcept {
   return static_cast<int>(time.count() < kMost ? time.count() : kMost);
 }
 
-// What a Client and its sessions share.
+// The state that a Client and its sessions share.
 struct ClientHandle {
   ClientHandle() = default;
   ClientHandle(const ClientHandle&) = delete;
   ClientHandle& operator=(const ClientHandle&) = delete;
   ~ClientHandle() { ::twr_client_destroy(client, closeTimeoutMs); }
 
-  std::function<void(State)> stateChanged;  // outlives the client, which calls it
+  std::function<void(State)> stateChanged;  // the client calls it, so it outlives the client
   int closeTimeoutMs = 1000;
   twr_client* client = nullptr;
 };
 
-// What a Session and its senders share.
+// The state that a Session and its senders share.
 struct SessionHandle {
   SessionHandle() = default;
   SessionHandle(const SessionHandle&) = delete;
@@ -357,10 +360,10 @@ struct SessionHandle {
 // ---- the client ----
 
 struct ClientOptions {
-  std::string socketPath;                   // empty: where the daemon usually is
-  std::size_t queueBytes = 0;               // of messages that wait for the daemon; 0 for the usual bound
-  bool once = false;                        // neither waits for a daemon nor connects again
-  std::function<void(State)> stateChanged;  // on the background thread, as a reply
+  std::string socketPath;                   // empty: the usual sockets
+  std::size_t queueBytes = 0;               // the most bytes that wait for the daemon; 0: the default
+  bool once = false;                        // tries to connect only once and never again
+  std::function<void(State)> stateChanged;  // runs on the background thread, as a reply does
 };
 
 struct ClientInfo {
@@ -373,7 +376,7 @@ struct ClientInfo {
   std::uint64_t queuedBytes = 0;
 };
 
-// One connection to the daemon, made when first needed. Any thread.
+// Is one connection to the daemon, opened when it is first needed. Any thread.
 class Client {
  public:
   using Milliseconds = std::chrono::milliseconds;
@@ -382,14 +385,14 @@ class Client {
   explicit Client(ClientOptions options) noexcept { open(std::move(options)); }
   Client(Client&&) noexcept = default;
   Client& operator=(Client&&) noexcept = default;
-  // With the last session gone, too: waits up to the close time-out until what is queued has gone out and
-  // those who wait for an answer have it.
+  // If no session is left, waits up to the close time-out until all requests are sent and answered. Otherwise
+  // the last session's destructor does.
   ~Client() = default;
 
   explicit operator bool() const noexcept { return get() != nullptr; }
   twr_client* get() const noexcept { return handle_ ? handle_->client : nullptr; }
 
-  // 1 s unless set.
+  // How long the destructor may wait. 1 s by default.
   void setCloseTimeout(Milliseconds timeout) noexcept {
     if (handle_) handle_->closeTimeoutMs = detail::millisecondsOf(timeout);
   }
@@ -416,7 +419,8 @@ class Client {
     return info;
   }
 
-  // To the sessions named; to none: to every started one, or else the daemon's own single-message session.
+  // Sends a message to these sessions. Without identifiers it goes to every started session, or, if there is
+  // none, to the daemon's own single-message session.
   Status send(Category category, Type type, const AnyPayload& payload,
               const std::vector<std::int64_t>& reporterIDs = {}, Reply reply = {}) noexcept {
     return detail::withReply(std::move(reply), [&](twr_reply run, void* context) {
@@ -439,13 +443,13 @@ class Client {
       return ::twr_client_get_all_reporters(get(), run, context);
     });
   }
-  // The answer is the connection's end.
+  // Ends the daemon. The only answer is the end of the connection: Status::kNotConnected.
   Status killService(Reply reply = {}) noexcept {
     return detail::withReply(std::move(reply), [&](twr_reply run, void* context) {
       return ::twr_client_kill_service(get(), run, context);
     });
   }
-  // Any method of the protocol by its name.
+  // Calls any method of the protocol by its name.
   template <std::size_t Bytes>
   Status request(const char* method, const Parameters<Bytes>& parameters, Reply reply = {}) noexcept {
     return detail::withReply(std::move(reply), [&](twr_reply run, void* context) {
@@ -475,8 +479,8 @@ class Client {
 
 // ---- sessions ----
 
-// What one use of audio reports. Any thread. Destroyed with the object and the last of its senders; a started
-// one is stopped then.
+// Reports one use of audio. Any thread. The session is destroyed with this object and the last of its
+// senders; a started session is stopped then.
 class Session {
  public:
   explicit Session(Client& client, std::int64_t reporterID = TWR_NEW_ID) noexcept {
@@ -520,7 +524,7 @@ class Session {
       return ::twr_session_stop(get(), run, context);
     });
   }
-  // Leaves this object empty. The session goes with its last sender, and `reply` then tells of it.
+  // Leaves this object empty. The session is destroyed with its last sender; `reply` is the reply to that.
   void destroy(Reply reply = {}) noexcept {
     if (handle_) handle_->destroyed = std::move(reply);
     handle_.reset();
@@ -534,7 +538,8 @@ class Session {
 
 // ---- senders ----
 
-// A real-time thread's way into a session: making and destroying one is not for such a thread, sending is.
+// Lets a real-time thread send to a session. Only send() is for such a thread; making and destroying a sender
+// is not.
 class Sender {
  public:
   // `ringBytes` is rounded up to a power of two; 0 for the default.

@@ -8,24 +8,25 @@
 #include <string>
 #include <unistd.h>
 
-// Signposts: what an audio program does, from a begin to an end, for performance traces of test sessions.
+// Signposts mark what an audio program does, from a begin to an end, in performance traces of test sessions.
 //
 //   void Decoder::run(const Packet& packet) {
 //     const tonewerk::signpost::Interval interval("decode", packet.number());
 //     ...
 //   }
 //
-// Any thread, real-time ones included. A pair costs a nanosecond or less while no trace runs. Nothing needs
-// to be linked: the library that knows how to trace is loaded when the program starts, and only where tracing
-// can happen, which the variable TONEWERK_SIGNPOSTS says ("0" never, "1" always, or the library's path), or
-// else the reporting daemon's mark in its runtime directory. Without that library there are no traces and no
-// errors.
+// Any thread may use them, also a real-time one. A pair costs a nanosecond or less while no trace runs. A
+// program links nothing: this header loads the tracing library when the program starts, if tracing is
+// possible. The variable TONEWERK_SIGNPOSTS decides that ("0" never, "1" always, or the library's path). If
+// it is not set, the library is loaded when the reporting daemon has put its mark into its runtime directory.
+// Without the library there are no traces and no errors.
 namespace tonewerk::signpost {
 
-// How the library and this header meet. Its one object lives as long as the process.
+// The functions of the library that this header calls. The library has one such object, which is never
+// destroyed.
 struct Provider {
-  const int* tracesBegins;  // not 0 while a trace wants to know
-  const int* tracesEnds;
+  const int* tracesBegins;  // not 0 while a trace records begins
+  const int* tracesEnds;    // not 0 while a trace records ends
   void (*begin)(const char* name, std::uint64_t identifier);
   void (*end)(const char* name, std::uint64_t identifier);
 };
@@ -38,7 +39,7 @@ namespace detail {
 
 inline std::atomic<const Provider*> provider = nullptr;
 
-// Whether the library may be loaded, and by what name; null when not.
+// The name or path of the library; null when it must not be loaded.
 inline const char* wantedLibrary() {
   const char* wish = secure_getenv("TONEWERK_SIGNPOSTS");
   if (wish != nullptr && *wish != '\0') {
@@ -54,8 +55,9 @@ inline const char* wantedLibrary() {
 
 }  // namespace detail
 
-// Loads the library, for good; null when that works or was done before, else why not. May take some tens of
-// milliseconds. For programs that load parts of themselves late; what is there at the start needs no call.
+// Loads the library for the rest of the process. Returns null on success or when it was loaded before,
+// otherwise the problem. May take some tens of milliseconds. Only parts of a program that are loaded late
+// need this call.
 inline const char* load(const char* library) {
   if (detail::provider.load(std::memory_order_acquire) != nullptr) return nullptr;
   void* handle = dlopen(library, RTLD_NOW | RTLD_NODELETE);
@@ -73,13 +75,14 @@ inline bool loadIfWanted() {
   return library != nullptr && load(library) == nullptr;
 }
 
-// Before main(), so that no real-time thread pays for it.
+// Runs before main(), so that no real-time thread waits for it.
 inline const bool isLoadedAtStart = loadIfWanted();
 
 }  // namespace detail
 
-// `name` is what probe lists name; its text is taken at once. `identifier` tells intervals of one name apart
-// that overlap on a thread. An interval ends on the thread that began it.
+// `name` is the name that lists of probes contain; its text is copied during the call. `identifier`
+// distinguishes intervals of the same name that overlap on a thread. An interval ends on the thread that
+// began it.
 inline void begin(const char* name, std::uint64_t identifier = 0) {
   const Provider* provider = detail::provider.load(std::memory_order_acquire);
   if (provider != nullptr && __atomic_load_n(provider->tracesBegins, __ATOMIC_RELAXED) != 0) {
@@ -94,7 +97,7 @@ inline void end(const char* name, std::uint64_t identifier = 0) {
   }
 }
 
-// From here to the end of the scope. `name` outlives it.
+// Marks an interval from here to the end of the scope. `name` outlives it.
 class Interval {
  public:
   explicit Interval(const char* name, std::uint64_t identifier = 0) : name_(name), identifier_(identifier) {
