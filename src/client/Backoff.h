@@ -9,21 +9,21 @@
 
 namespace tonewerk {
 
-// A growing delay, and up to a quarter more or less than that, so that clients that lost one daemon do not
-// all come back at once.
+// Yields delays that grow, each changed at random by up to a quarter, so that clients that lost the same
+// daemon do not all reconnect at once.
 class Backoff {
  public:
-  Backoff(std::chrono::milliseconds first, std::chrono::milliseconds most, std::uint32_t seed)
-      : first_(first), most_(most), delay_(first, most), random_(seed) {}
+  Backoff(std::chrono::milliseconds first, std::chrono::milliseconds max, std::uint32_t seed)
+      : first_(first), max_(max), delay_(first, max), random_(seed) {}
 
-  // At least the first delay, at most the longest.
+  // The next delay: at least the first one, at most the longest.
   std::chrono::milliseconds next();
-  // What was connected to was good: the next delay is the first again.
+  // Makes the next delay the first one again. For after a good connection.
   void reset() { delay_.reset(); }
 
  private:
   std::chrono::milliseconds first_;
-  std::chrono::milliseconds most_;
+  std::chrono::milliseconds max_;
   GrowingDelay delay_;
   std::minstd_rand random_;
 };

@@ -20,7 +20,7 @@ using std::chrono::milliseconds;
 
 constexpr const char* kThreadName = "tw-reporting";
 constexpr std::size_t kReadBytes = std::size_t{16} * 1024;
-// Reads, and writes, in a row before the other side has its turn.
+// How many reads or writes the thread makes in a row before it turns to the other direction.
 constexpr int kMaxTransfers = 16;
 
 std::uint32_t seed() {
@@ -45,7 +45,7 @@ class SCOPED_CAPABILITY MutexUnlock {
 ClientEngine::ClientEngine(ClientSettings settings)
     : settings_(std::move(settings)),
       outbox_(settings_.queueBytes, deliveries_),
-      backoff_(settings_.firstDelay, settings_.mostDelay, seed()),
+      backoff_(settings_.firstDelay, settings_.maxDelay, seed()),
       ringPoll_(settings_.busyPoll) {}
 
 // ---- callers ----
@@ -53,7 +53,7 @@ ClientEngine::ClientEngine(ClientSettings settings)
 bool ClientEngine::ensureRunning() {
   if (isEnding_) return true;
   if (thread_.isRunning()) {
-    // While there is no daemon the thread has nothing to do; while the daemon reads nothing, neither.
+    // The thread has nothing to do while there is no daemon, or while the daemon does not read.
     if (state_ == TWR_STATE_CONNECTED && !awaitsRoom_) wake();
     return true;
   }
@@ -91,7 +91,7 @@ twr_status ClientEngine::flush(milliseconds timeout) {
 }
 
 twr_status ClientEngine::await(MutexLock& lock, const std::shared_ptr<Waiter>& waiter, milliseconds timeout) {
-  // Somebody waits: not for the back-off.
+  // A caller waits, so the next attempt is made at once.
   nextAttempt_ = Clock::now();
   if (!ensureRunning()) return TWR_NO_MEMORY;
   wake();
@@ -125,7 +125,8 @@ void ClientEngine::beginToEnd(milliseconds timeout) {
   wake();
 }
 
-// The library's end may come while somebody destroys the client: one of the two joins, the other waits.
+// The library may be unloaded while another thread destroys the client: one of the two joins, the other
+// waits.
 void ClientEngine::joinThread(MutexLock& lock) {
   if (!thread_.isRunning()) return;
   if (isBeingJoined_) {
@@ -206,7 +207,7 @@ void ClientEngine::run() {
       connectionLost(ENOMEM);
     }
     if (deliver()) {
-      if (hasForked_) return;  // a callback forked, and this is the child
+      if (hasForked_) return;  // a callback has forked, and this is the child process
       continue;
     }
     if (!isDone()) sleep();
@@ -226,7 +227,7 @@ void ClientEngine::work() {
 
 bool ClientEngine::isDone() const {
   if (!isEnding_) return false;
-  if (isAbandoned_ || isHopeless_ || state_ == TWR_STATE_ENDED || Clock::now() >= endBy_) return true;
+  if (isAbandoned_ || foundNoDaemon_ || state_ == TWR_STATE_ENDED || Clock::now() >= endBy_) return true;
   return !socket_.isOpen() && outbox_.isEmpty();
 }
 
@@ -250,7 +251,8 @@ void ClientEngine::finish() {
 
 void ClientEngine::attempt() {
   setState(TWR_STATE_CONNECTING);
-  // The first place at which there is something says more than the last, at which there may be nothing.
+  // Report the error of the first path at which there is a socket, rather than that there is none at the last
+  // path.
   int problem = ENOENT;
   for (const std::string& path : settings_.socketPaths) {
     const int error = connectTo(path);
@@ -260,7 +262,7 @@ void ClientEngine::attempt() {
   attemptFailed(problem);
 }
 
-// The descriptor is the member all the while, so that a child process closes its copy.
+// The descriptor is in the member during the whole attempt, so that a forked child closes its copy.
 int ClientEngine::connectTo(const std::string& path) {
   int error = socket_.open();
   if (error != 0) return error;
@@ -287,7 +289,7 @@ void ClientEngine::connected(const std::string& path) {
 }
 
 void ClientEngine::attemptFailed(int error) {
-  isHopeless_ = isEnding_;
+  foundNoDaemon_ = isEnding_;
   waitBeforeNextAttempt(error);
   for (const std::shared_ptr<Waiter>& waiter : std::exchange(connectWaiters_, {}))
     waiter->finish(TWR_NOT_CONNECTED);
@@ -312,7 +314,7 @@ void ClientEngine::waitBeforeNextAttempt(int error) {
   }
   nextAttempt_ = Clock::now() + backoff_.next();
   if (isEnding_) {
-    state_ = TWR_STATE_WAITING;  // not for long, and nobody need be told
+    state_ = TWR_STATE_WAITING;  // only for a short time, so state_changed is not called
   } else {
     setState(TWR_STATE_WAITING);
   }
@@ -324,7 +326,8 @@ void ClientEngine::transmit() {
     if (bytes.empty()) {
       outbox_.sent(0);
       if (!isEnding_ || !outbox_.isEmpty()) return;
-      // The daemon answers nothing to who says no more; and who is answered may have more to say.
+      // The daemon answers no requests after the end of sending, and an answer's callback may make another
+      // request.
       if (outbox_.awaitsAnswers() || !deliveries_.empty()) return;
       hasEndedSending_ = true;
       socket_.endSending();
@@ -340,7 +343,7 @@ void ClientEngine::transmit() {
     if (transfer.error != 0) return connectionLost(transfer.error);
     outbox_.sent(transfer.bytes);
   }
-  isWoken_ = true;  // there may be more
+  isWoken_ = true;  // there may be more to send
 }
 
 void ClientEngine::receive() {
@@ -405,7 +408,7 @@ void ClientEngine::sleep() {
   if ((polled[1].revents & POLLOUT) != 0) awaitsRoom_ = false;
 }
 
-// In milliseconds, rounded up; -1 for as long as it takes.
+// In milliseconds, rounded up; -1 to wait without a limit.
 int ClientEngine::pollTimeout() {
   std::optional<Clock::time_point> until;
   const auto notAfter = [&](Clock::time_point time) { until = until ? std::min(*until, time) : time; };

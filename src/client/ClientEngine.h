@@ -24,7 +24,7 @@
 
 namespace tonewerk {
 
-// What a client is made with.
+// The settings of a client.
 struct ClientSettings {
   static constexpr std::size_t kDefaultQueueBytes = std::size_t{256} * 1024;
 
@@ -34,34 +34,35 @@ struct ClientSettings {
   void (*stateChanged)(void* context, twr_state state) = nullptr;
   void* context = nullptr;
 
-  // Between attempts to connect; see Backoff.
+  // The first and the longest delay between attempts to connect; see Backoff.
   std::chrono::milliseconds firstDelay{250};
-  std::chrono::milliseconds mostDelay{30'000};
-  // A connection that the daemon kept for so long was a good one, even if it never had to answer.
+  std::chrono::milliseconds maxDelay{30'000};
+  // A connection that lasted this long counts as a good one, even if the daemon answered nothing.
   std::chrono::milliseconds settledTime{5'000};
-  // Between looks at the senders' rings: while messages come, and after a while without any.
+  // How often the thread reads the senders' rings: while messages arrive, and at most after a pause.
   std::chrono::milliseconds busyPoll{10};
   std::chrono::milliseconds idlePoll{100};
 };
 
-// A client: its outbox, its connection, and the thread that carries the one through the other.
+// Runs a client: owns its outbox, its connection, and the thread that sends what is in the outbox.
 //
 //   idle --- first request ---> connecting --- the daemon accepts ---> connected
-//   connecting --- nobody there ---> waiting        connected --- the connection breaks ---> waiting
+//   connecting --- no daemon ---> waiting           connected --- the connection breaks ---> waiting
 //   waiting --- after the back-off ---> connecting  with `isOnce`, instead of waiting: ended
 //
-// One mutex guards everything. The thread holds it but while it waits, while it is in a system call about the
-// socket, and while it calls a caller's function; so whoever holds it (a fork) finds everything whole.
+// One mutex guards all members. The thread releases it only while it waits, during a system call on the
+// socket, and while it calls a caller's function. A fork, which takes the mutex, therefore finds all members
+// consistent.
 class ClientEngine {
  public:
   explicit ClientEngine(ClientSettings settings);
   ClientEngine(const ClientEngine&) = delete;
   ClientEngine& operator=(const ClientEngine&) = delete;
-  // After end(), or in a child process.
+  // Only after end(), or in a forked child process.
   ~ClientEngine() = default;
 
-  // Calls `ask` with the outbox and makes sure that what it put there goes out. TWR_FORKED, TWR_NOT_CONNECTED
-  // when the client has ended, TWR_NO_MEMORY, or what `ask` returns.
+  // Calls `ask` with the outbox, and makes sure that the thread runs and sends what `ask` has put there.
+  // Returns TWR_FORKED, TWR_NOT_CONNECTED when the client has ended, TWR_NO_MEMORY, or the result of `ask`.
   template <class Ask>
   [[nodiscard]] twr_status request(Ask ask) {
     if (hasForked_.load(std::memory_order_relaxed)) return TWR_FORKED;
@@ -69,7 +70,7 @@ class ClientEngine {
     if (state_ == TWR_STATE_ENDED) return TWR_NOT_CONNECTED;
     return ensureRunning() ? ask(outbox_) : TWR_NO_MEMORY;
   }
-  // The same for what must be done whether the client has ended or not, or has forked away.
+  // The same for calls that must be made even if the client has ended or the process has forked.
   template <class Do>
   [[nodiscard]] auto withOutbox(Do function) {
     const MutexLock lock(mutex_);
@@ -80,13 +81,13 @@ class ClientEngine {
     return result;
   }
 
-  // Not inside a callback, which would wait for itself: TWR_WOULD_WAIT.
+  // Return TWR_WOULD_WAIT inside a callback, which would wait for itself.
   [[nodiscard]] twr_status connect(std::chrono::milliseconds timeout);
   [[nodiscard]] twr_status flush(std::chrono::milliseconds timeout);
-  // Sends what is queued, within the time, and ends the thread. Nothing is called after it has returned.
+  // Sends what is queued, for up to `timeout`, and ends the thread. No callback runs after it has returned.
   void end(std::chrono::milliseconds timeout);
-  // The same inside one of this client's callbacks, where it cannot be waited for: answers still come, states
-  // do not, and the registry buries the client later. False, with nothing done, anywhere else.
+  // Does the same inside one of this client's callbacks, without waiting: answers are still delivered, states
+  // are not, and the registry destroys the client later. Anywhere else it does nothing and returns false.
   [[nodiscard]] bool endByItself(std::chrono::milliseconds timeout);
 
   twr_client_info info() const;
@@ -94,7 +95,8 @@ class ClientEngine {
 
   // ---- for the registry ----
 
-  // Under the registry's mutex. The owner is what this is a part of, and holds itself until it is removed.
+  // The registry's mutex guards these two. The owner is the object that this engine is a part of. It keeps
+  // itself alive through this pointer until the registry removes it.
   ClientEngine* nextClient = nullptr;
   std::shared_ptr<void> owner;
   // A fork holds the mutexes of all clients at once. The analysis cannot follow one mutex for each object in
@@ -102,17 +104,17 @@ class ClientEngine {
   void beforeFork() NO_THREAD_SAFETY_ANALYSIS { mutex_.lock(); }
   void afterForkInParent() NO_THREAD_SAFETY_ANALYSIS { mutex_.unlock(); }
   void afterForkInChild() NO_THREAD_SAFETY_ANALYSIS;
-  // One that may be joined from here.
+  // True when there is a thread and the caller may join it.
   bool hasThread() const;
-  // Ended by itself, and nothing is left to be done but to join its thread.
+  // True after endByItself(), once the thread only has to be joined.
   bool isReapable() const;
-  // Ends the thread at once; nobody is told.
+  // Ends the thread at once. No callback runs.
   void abandon();
 
  private:
   using Clock = std::chrono::steady_clock;
 
-  // Called by callers. False when there can be no thread.
+  // These run on callers' threads. False when no thread can be started.
   [[nodiscard]] bool ensureRunning() REQUIRES(mutex_);
   void wake() REQUIRES(mutex_);
   [[nodiscard]] twr_status await(MutexLock& lock, const std::shared_ptr<Waiter>& waiter,
@@ -122,7 +124,7 @@ class ClientEngine {
 
   void becomeForked() REQUIRES(mutex_);
 
-  // Called on the thread.
+  // These run on the client's thread.
   static void runThread(void* self);
   void run();
   bool isDone() const REQUIRES(mutex_);
@@ -130,7 +132,7 @@ class ClientEngine {
   void attemptFailed(int error) REQUIRES(mutex_);
   [[nodiscard]] bool decode(std::string_view bytes) REQUIRES(mutex_);
   void connectionLost(int error) REQUIRES(mutex_);
-  // Why answers that are still to come will not.
+  // The status for requests whose answers will not come any more.
   twr_status whyUnanswered() const REQUIRES(mutex_) {
     return hasEndedSending_ ? TWR_DESTROYED : TWR_NOT_CONNECTED;
   }
@@ -138,14 +140,14 @@ class ClientEngine {
   int pollTimeout() REQUIRES(mutex_);
   void setState(twr_state state) REQUIRES(mutex_);
 
-  // Called on the thread. These release the mutex for a while and hold it again when they return.
+  // These run on the client's thread, release the mutex for a while and hold it again when they return.
   void work() REQUIRES(mutex_);
   void finish() REQUIRES(mutex_);
   void attempt() REQUIRES(mutex_);
   [[nodiscard]] int connectTo(const std::string& path) REQUIRES(mutex_);
   void transmit() REQUIRES(mutex_);
   void receive() REQUIRES(mutex_);
-  // False when there was nothing to call.
+  // False when there was no callback to run.
   bool deliver() REQUIRES(mutex_);
   void sleep() REQUIRES(mutex_);
 
@@ -167,7 +169,7 @@ class ClientEngine {
   RpcStrings texts_ GUARDED_BY(mutex_){StringInterner(64, 64), StringInterner(64, 32)};
   std::optional<RpcFrameReader> reader_ GUARDED_BY(mutex_);
   bool isReadable_ GUARDED_BY(mutex_) = false;
-  bool awaitsRoom_ GUARDED_BY(mutex_) = false;  // the kernel takes no more for now
+  bool awaitsRoom_ GUARDED_BY(mutex_) = false;  // the kernel's buffer is full
   bool hasEndedSending_ GUARDED_BY(mutex_) = false;
   bool hasAnswered_ GUARDED_BY(mutex_) = false;
   Clock::time_point connectedAt_ GUARDED_BY(mutex_);
@@ -182,7 +184,7 @@ class ClientEngine {
   bool hasFinished_ GUARDED_BY(mutex_) = false;
   bool isBeingJoined_ GUARDED_BY(mutex_) = false;
   Condition joined_;
-  bool isHopeless_ GUARDED_BY(mutex_) = false;  // ending, and nobody is there
+  bool foundNoDaemon_ GUARDED_BY(mutex_) = false;  // the client is ending and no daemon listens
   Clock::time_point endBy_ GUARDED_BY(mutex_);
 
   std::uint64_t seenRingMessages_ GUARDED_BY(mutex_) = 0;

@@ -13,14 +13,14 @@ namespace {
 
 using Kind = SessionChange::Kind;
 
-constexpr std::size_t kLeastReplies = 64;
+constexpr std::size_t kMinReplies = 64;
 
-// What a message counts for in the queue.
+// How many bytes of the queue a message takes.
 std::size_t bytesOf(std::size_t payloadBytes, std::size_t reporterIDs) {
   return kCommandBytes + payloadBytes + kMessageFrameBytes + reporterIDs * kReporterIDBytes;
 }
 
-// A session's message that is to be kept.
+// Copies a session's message into a command for the queue.
 Command commandOf(const RingMessage& message) {
   Command command;
   command.message = message;
@@ -31,7 +31,7 @@ Command commandOf(const RingMessage& message) {
   return command;
 }
 
-// Nothing but the loss of what came before.
+// A message that only reports the losses before it.
 RingMessage lossOf(const twr_session& session, std::uint64_t lostBefore) {
   return {session.losses.lastCategory(), TWR_TYPE_UNKNOWN, coarseSeconds(), lostBefore, 0, {}};
 }
@@ -42,7 +42,7 @@ bool fitsFrame(const ValueMap& configuration) {
   return body.size() + RpcWriter::kMaxHeadBytes + kReporterIDBytes <= kMaxFrameBytes;
 }
 
-// A command of a session marks each of its senders' rings.
+// A session's command has a mark in the ring of each of its senders.
 std::size_t markBytes(const twr_session& session) { return session.senders.size() * sizeof(RingMark); }
 
 std::vector<RingMark> marksOf(const std::vector<std::shared_ptr<twr_sender>>& senders) {
@@ -53,8 +53,8 @@ std::vector<RingMark> marksOf(const std::vector<std::shared_ptr<twr_sender>>& se
   return marks;
 }
 
-// After everything the session has said so far, and lost. The count comes first: whatever is counted by now
-// was lost before what is written by then.
+// Places the command after all messages that the session has sent or lost so far. The count is read first,
+// because every loss in it happened before the positions that are read afterwards.
 void placeLast(Command& command, const twr_session& session) {
   command.lostBefore = session.losses.count();
   command.marks = marksOf(session.senders);
@@ -64,7 +64,7 @@ void placeLast(Command& command, const twr_session& session) {
 
 ClientOutbox::ClientOutbox(std::size_t queueBytes, Deliveries& deliveries)
     : deliveries_(deliveries),
-      mostReplies_(std::max(kLeastReplies, queueBytes / kBytesPerReply)),
+      maxReplies_(std::max(kMinReplies, queueBytes / kBytesPerReply)),
       queue_(queueBytes) {}
 
 // ---- callers ----
@@ -160,7 +160,7 @@ void ClientOutbox::addBarrier(std::shared_ptr<Waiter> waiter) {
 
 bool ClientOutbox::acceptReply(bool isStart) {
   std::size_t& count = isStart ? startReplyCount_ : replyCount_;
-  if (count >= (isStart ? kMaxStartReplies : mostReplies_)) return false;
+  if (count >= (isStart ? kMaxStartReplies : maxReplies_)) return false;
   ++count;
   return true;
 }
@@ -183,9 +183,9 @@ void ClientOutbox::reconcileLater(twr_session& session) {
   }
   *session.lastReconciliation->wanted = session.wanted;
   placeLast(*session.lastReconciliation, session);
-  // A session that came and went without the daemon's having heard of it: nothing is left to be told.
-  const bool neverWas = !session.sent.exists && !session.wanted.exists && session.queued == 1;
-  if (!neverWas || session.unsent > 0 || !session.senders.empty()) return;
+  // The session was made and destroyed before the daemon heard of it, so there is nothing to send.
+  const bool wasNeverSent = !session.sent.exists && !session.wanted.exists && session.queued == 1;
+  if (!wasNeverSent || session.unsent > 0 || !session.senders.empty()) return;
   queue_.remove(*session.lastReconciliation);
 }
 
@@ -217,11 +217,11 @@ void ClientOutbox::fill() {
   if (!toRecreate_.empty()) return;
   drainQuietRings();
   while (!batch_.isFull() && !queue_.empty() && drainMarks(queue_.front())) encodeNext();
-  // Only now nothing that was asked for before can be behind what is in the rings.
+  // With an empty queue, no earlier request can follow the messages in the rings.
   if (queue_.empty()) drainQuietRings();
 }
 
-// As the daemon had it when the connection broke.
+// Sends the state that the daemon knew of this session when the connection broke.
 void ClientOutbox::recreate(twr_session& session) {
   for (const SessionChange& change : changesBetween({}, session.sent)) {
     OutgoingFrame frame;
@@ -268,34 +268,34 @@ void ClientOutbox::encodeMessage(Command command) {
     frame.isMessage = true;
   } else {
     appendOf(*command.session, message, frame);
-    command.session->told.late += command.lostAfter;
+    command.session->reported.lostLate += command.lostAfter;
   }
   frame.command = std::move(command);
   batch_.add(std::move(frame));
 }
 
 void ClientOutbox::encodeLoss(Command command) {
-  if (command.session->told.owes(command.lostBefore)) {
+  if (command.session->reported.hasUnreported(command.lostBefore)) {
     encodeMessage(std::move(command));
   } else {
-    passOver(std::move(command));
+    addWithoutBytes(std::move(command));
   }
 }
 
-// One that says nothing, but has its place among the others.
-void ClientOutbox::passOver(Command command) {
+// Adds a frame without bytes. It keeps its place among the others until they are sent.
+void ClientOutbox::addWithoutBytes(Command command) {
   OutgoingFrame frame;
-  frame.toldBefore = command.session->told.counted;
-  command.session->told.late += command.lostAfter;
+  frame.reportedBefore = command.session->reported.counted;
+  command.session->reported.lostLate += command.lostAfter;
   frame.command = std::move(command);
   batch_.add(std::move(frame));
 }
 
-// A message of the session, with what is owed of its losses.
+// Appends a message of the session with the number of losses that no message has reported yet.
 void ClientOutbox::appendOf(twr_session& session, const RingMessage& message, OutgoingFrame& frame) {
-  frame.toldBefore = session.told.counted;
-  frame.lateTold = session.told.late;
-  const std::uint64_t dropped = session.told.take(message.lostBefore);
+  frame.reportedBefore = session.reported.counted;
+  frame.lateReported = session.reported.lostLate;
+  const std::uint64_t dropped = session.reported.take(message.lostBefore);
   frame.bodyAt = appendMessageFrame(batch_.bytes(), frame.optionalIdentifier(), message, dropped,
                                     {&session.identifier, 1});
   frame.bodyBytes = message.bytes.size();
@@ -305,11 +305,11 @@ void ClientOutbox::appendOf(twr_session& session, const RingMessage& message, Ou
 void ClientOutbox::encodeChange(Command command) {
   twr_session& session = *command.session;
   const SessionChange& change = *command.change;
-  // What was dropped and no message has told of: the last chance while the session runs.
+  // Losses that no message has reported are reported now, because the session ends here.
   if (session.sent.exists && (change.kind == Kind::kStop || change.kind == Kind::kDestroy))
     appendLoss(session, command.lostBefore);
   OutgoingFrame frame;
-  frame.toldBefore = session.told.counted;
+  frame.reportedBefore = session.reported.counted;
   frame.stateBefore = std::make_unique<SessionState>(session.sent);
   frame.startsBefore = session.starts;
   frame.startCountBefore = session.starts == nullptr ? 0 : session.starts->waiting.size();
@@ -322,12 +322,13 @@ void ClientOutbox::encodeChange(Command command) {
       if (session.starts == nullptr) session.starts = std::make_shared<StartReplies>();
       session.starts->waiting.push_back(command.reply);
     }
-    // A start of what is started is never answered: its caller joins the one that waits already.
+    // The daemon never answers the start of a started session. Its caller waits with the caller of the first
+    // start.
     if (!wasStarted) entry = {{}, session.starts, true};
   } else {
     entry.reply = command.reply;
-    // The daemon does not answer the start of a session that is destroyed or made anew, nor of one that was
-    // started without a reply; the answer to what ended the run stands for it.
+    // The daemon does not answer the start of a session that is destroyed or made again, nor a start that was
+    // sent without a reply. The answer to the request that ended the run is delivered instead.
     if (wasStarted && !session.sent.isStarted) entry.starts = std::exchange(session.starts, nullptr);
   }
   if (entry.reply || (entry.starts != nullptr && !entry.starts->waiting.empty()))
@@ -335,15 +336,15 @@ void ClientOutbox::encodeChange(Command command) {
 
   RpcWriter(batch_.bytes()).head(frame.optionalIdentifier());
   appendChange(batch_.bytes(), change, session.identifier);
-  session.told.late += command.lostAfter;
+  session.reported.lostLate += command.lostAfter;
   frame.command = std::move(command);
   batch_.add(std::move(frame));
 }
 
-// What is still to be done for it takes its place.
+// Replaces a reconciliation by the changes that the session still needs.
 void ClientOutbox::expand(Command reconciliation) {
   std::vector<SessionChange> changes = changesBetween(reconciliation.session->sent, *reconciliation.wanted);
-  if (changes.empty()) return passOver(std::move(reconciliation));
+  if (changes.empty()) return addWithoutBytes(std::move(reconciliation));
   std::uint64_t lostAfter = reconciliation.lostAfter;
   for (auto change = changes.rbegin(); change != changes.rend(); ++change) {
     Command command;
@@ -384,7 +385,8 @@ void ClientOutbox::disconnected(twr_status why) {
   const auto lost = std::make_shared<DecodedAnswer>(why);
   for (const ReplyTable::Entry& entry : replies_.takeAll()) {
     deliver(entry.reply, lost);
-    // A start's stay: the session is started again. Only what should have ended a run leaves it in doubt.
+    // Replies of a start stay, because the session is started again. Replies to a request that ends the run
+    // are called, because it is not known whether the run has ended.
     if (!entry.isStart && entry.starts != nullptr) deliver(*entry.starts, lost);
   }
   absorbClosedRings();
@@ -395,9 +397,9 @@ void ClientOutbox::takeBack(OutgoingFrame frame) {
   // The reply itself is in the command, which waits for it again in the queue.
   if (frame.identifier != 0) (void)replies_.take(frame.identifier);
   if (frame.command.session != nullptr) {
-    ToldLosses& told = frame.command.session->told;
-    told.counted = frame.toldBefore;
-    told.late = told.late - frame.command.lostAfter + frame.lateTold;
+    ReportedLosses& reported = frame.command.session->reported;
+    reported.counted = frame.reportedBefore;
+    reported.lostLate = reported.lostLate - frame.command.lostAfter + frame.lateReported;
   }
   if (frame.stateBefore != nullptr) {
     twr_session& session = *frame.command.session;
@@ -407,7 +409,7 @@ void ClientOutbox::takeBack(OutgoingFrame frame) {
     if (waiting > frame.startCountBefore) {
       session.starts->waiting.resize(frame.startCountBefore);
     } else if (frame.startsBefore != nullptr && frame.command.reply.isStart) {
-      frame.command.reply = {};  // told already, with those that it had joined
+      frame.command.reply = {};  // called already, with the replies that it waited with
     }
   }
   if (frame.origin == OutgoingFrame::Origin::kRing) {
@@ -440,7 +442,7 @@ void ClientOutbox::end(twr_status why) {
     const std::shared_ptr<StartReplies> starts = std::exchange(session->starts, nullptr);
     if (starts != nullptr) deliver(*starts, lost);
   }
-  absorbClosedRings();  // into nothing
+  absorbClosedRings();  // drops their messages, since the outbox has ended
   std::erase_if(sessions_, [](const auto& session) { return session->isDestroyed; });
 }
 
@@ -461,7 +463,7 @@ void ClientOutbox::closeSender(twr_sender& sender) {
 }
 
 void ClientOutbox::close(twr_sender& sender) {
-  if (sender.isClosed) return;  // by its caller, before the session: what was lost since is not its own
+  if (sender.isClosed) return;  // its caller closed it before the session; later losses are not its own
   sender.isClosed = true;
   if (const std::shared_ptr<twr_session> session = sender.session.lock())
     sender.lostAtClose = session->losses.count();
@@ -473,12 +475,12 @@ bool ClientOutbox::hasRingData() const {
   });
 }
 
-// Those of sessions with nothing in the queue that would have to go out first.
+// Sends the messages in rings of sessions without queued commands. Those would have to be sent first.
 void ClientOutbox::drainQuietRings() {
   const auto isQuiet = [](const twr_sender& sender) { return sender.session.lock()->queued == 0; };
   for (const std::shared_ptr<twr_sender>& sender : senders_)
     if (isQuiet(*sender) && !drain(*sender, sender->ring.writtenPosition())) return;
-  // Only then: what one of them has lost may lie between what others have said.
+  // Only after all were drained, because a loss of one ring may lie between messages of the others.
   for (std::size_t at = 0; at < senders_.size();) {
     const std::shared_ptr<twr_sender> sender = senders_[at];
     if (sender->isClosed && isQuiet(*sender)) {
@@ -489,7 +491,8 @@ void ClientOutbox::drainQuietRings() {
   }
 }
 
-// What had been written to rings when `command` was asked for. False when the batch is full first.
+// Sends the messages that were in rings before `command` was queued. False when the batch is full before that
+// is done.
 bool ClientOutbox::drainMarks(Command& command) {
   for (const RingMark& mark : command.marks)
     if (!drain(*mark.sender, mark.position)) return false;
@@ -510,7 +513,7 @@ bool ClientOutbox::drain(twr_sender& sender, std::uint64_t position) {
   return true;
 }
 
-// A closed one that has been drained. It may have been finished before.
+// Removes a closed sender whose ring is drained. It may have been removed before.
 void ClientOutbox::finish(twr_sender& sender) {
   const std::shared_ptr<twr_session> session = sender.session.lock();
   if (session != nullptr && sender.ring.dropped() > 0) appendLoss(*session, sender.lostAtClose);
@@ -531,11 +534,12 @@ void ClientOutbox::appendFromRing(twr_session& session, const RingMessage& messa
 }
 
 void ClientOutbox::appendLoss(twr_session& session, std::uint64_t lostBefore) {
-  if (!session.told.owes(lostBefore)) return;
+  if (!session.reported.hasUnreported(lostBefore)) return;
   appendFromRing(session, lossOf(session, lostBefore), Command::Kind::kLoss);
 }
 
-// Nobody takes what is in them, or too slowly: it goes to the queue, within its bound.
+// Moves the messages in closed rings to the queue, within its bound, while the daemon does not read them or
+// reads them too slowly.
 void ClientOutbox::absorbClosedRings() {
   std::size_t bytes = 0;
   std::vector<std::shared_ptr<twr_sender>> closed;
@@ -548,9 +552,9 @@ void ClientOutbox::absorbClosedRings() {
   for (const std::shared_ptr<twr_sender>& sender : closed) absorb(*sender);
 }
 
-// What had been written when something in the queue was asked for goes before it.
+// Moves a ring's messages to the queue. Messages from before a queued command go before it.
 void ClientOutbox::absorb(twr_sender& sender) {
-  auto closing = queue_.end();  // what was asked for next after the close
+  auto closing = queue_.end();  // the first command that was queued after the close
   bool isWhole = true;
   for (auto place = queue_.begin(); place != queue_.end(); ++place) {
     const auto mark = std::find_if(place->marks.begin(), place->marks.end(),
@@ -565,7 +569,7 @@ void ClientOutbox::absorb(twr_sender& sender) {
   removeSender(sender);
 }
 
-// False when something was lost.
+// False when a message was lost.
 bool ClientOutbox::absorbUpTo(twr_sender& sender, std::uint64_t position, CommandQueue::Iterator place) {
   const std::shared_ptr<twr_session> session = sender.session.lock();
   std::uint64_t lost = 0;
@@ -579,16 +583,16 @@ bool ClientOutbox::absorbUpTo(twr_sender& sender, std::uint64_t position, Comman
       session->losses.setLastCategory(message->category);
       isWhole = false;
     } else {
-      loseBefore(place, *session, std::exchange(lost, 0));
+      countLossBefore(place, *session, std::exchange(lost, 0));
       insert(place, *session, commandOf(*message));
     }
     sender.ring.pop();
   }
-  loseBefore(place, *session, lost);
+  countLossBefore(place, *session, lost);
   return isWhole;
 }
 
-// Without room it is told by the session's next message, or its end.
+// If there is no room, the session's next message or its end reports the loss.
 void ClientOutbox::absorbLoss(twr_sender& sender, CommandQueue::Iterator place) {
   const std::shared_ptr<twr_session> session = sender.session.lock();
   Command command = commandOf(lossOf(*session, sender.lostAtClose));
@@ -602,20 +606,21 @@ void ClientOutbox::insert(CommandQueue::Iterator place, twr_session& session, Co
   queue_.insert(place, std::move(command));
 }
 
-// So many of the session's, which had been taken: after what it asked for last before `place`.
-void ClientOutbox::loseBefore(CommandQueue::Iterator place, twr_session& session, std::uint64_t lost) {
+// Counts messages that the ring had taken and that are lost now, after the session's last command before
+// `place`.
+void ClientOutbox::countLossBefore(CommandQueue::Iterator place, twr_session& session, std::uint64_t lost) {
   if (lost == 0) return;
   while (place != queue_.begin()) {
     if ((--place)->session.get() != &session) continue;
     place->lostAfter += lost;
     return;
   }
-  session.told.late += lost;
+  session.reported.lostLate += lost;
 }
 
 void ClientOutbox::removeSender(twr_sender& sender) {
   const auto isIt = [&](const std::shared_ptr<twr_sender>& held) { return held.get() == &sender; };
-  // Something in the queue may still hold a mark on one that is gone.
+  // A queued command may still have a mark of a sender that was removed.
   if (std::erase_if(senders_, isIt) == 0) return;
   dropped_ += sender.ring.dropped();
   const std::shared_ptr<twr_session> session = sender.session.lock();

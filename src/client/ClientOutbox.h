@@ -21,25 +21,26 @@
 
 namespace tonewerk {
 
-// What a client has to say, to whom it is owed an answer, and what its daemon knows so far.
+// Holds what a client has to send, who waits for answers, and what the daemon knows so far.
 //
 //   callers:  change(), send() ...        the thread:  connected()
 //                                                      unsent() -> sent() ...   answered() ...
 //                                                      disconnected(), and begin again
 //
-// What has gone out is known to the daemon; it is told again, as the state it led to, after connected(). What
-// has not gone out waits in its order. No thread and no socket in here: everything happens under the engine's
-// mutex. Callers' functions are never called, only put into the deliveries.
+// The daemon knows what was sent; after connected() the resulting state of each session is sent again. What
+// was not sent waits in its order. There is no thread and no socket in here: the engine's mutex is held
+// during every call. Callers' functions are never called here, only added to the deliveries.
 class ClientOutbox {
  public:
-  // As many as the daemon takes of one connection.
+  // The daemon accepts as many on one connection.
   static constexpr std::size_t kMaxSessions = 4096;
   static constexpr std::size_t kMaxSenders = 4096;
-  // Callers that wait for a session's stop, all sessions together.
+  // How many callers may wait for a session's stop, all sessions together.
   static constexpr std::size_t kMaxStartReplies = 2 * kMaxSessions;
-  // Of the queue's bytes, how many make room for one answer to wait for.
+  // One request may wait for its answer for each so many bytes of the queue.
   static constexpr std::size_t kBytesPerReply = 64;
-  // What closed senders may hold that wait for a daemon that reads nothing; past it they go to the queue.
+  // How many bytes closed senders' rings may hold while the daemon does not read. Beyond it their messages
+  // move to the queue.
   static constexpr std::size_t kMaxClosedRingBytes = TWR_MOST_RING_BYTES;
 
   // `deliveries` outlives this.
@@ -49,17 +50,18 @@ class ClientOutbox {
 
   // Null when there are too many.
   [[nodiscard]] std::shared_ptr<twr_session> addSession(ClientEngine& engine, std::int64_t reporterID);
-  // TWR_FULL, only where there is a reply: it will not be called, for want of room; the change is made all
-  // the same. One that finds no room itself is not lost, either: what the session has become is told once
-  // there is room again.
+  // Returns TWR_FULL only with a reply: there is no room for the reply, so it will not be called, but the
+  // change is made. A change that finds no room itself is not lost either: the session's new state is sent
+  // once there is room.
   [[nodiscard]] twr_status change(twr_session& session, SessionChange change, PendingReply reply);
-  // The same with a destroying change; the session's senders are closed.
+  // Destroys the session in the same way, and closes its senders.
   [[nodiscard]] twr_status destroy(twr_session& session, PendingReply reply);
-  // A message, to a session or (null) to `reporterIDs`. TWR_FULL: dropped and counted.
+  // Queues a message for `session`, or, if that is null, for `reporterIDs`. TWR_FULL: it is dropped and
+  // counted.
   [[nodiscard]] twr_status send(twr_session* session, const RingMessage& message,
                                 std::span<const std::int64_t> reporterIDs, PendingReply reply);
   [[nodiscard]] twr_status request(std::string body, PendingReply reply);
-  // Finishes `waiter` when everything before has gone out, or when that failed.
+  // Finishes `waiter` when everything queued before it was sent, or when that failed.
   void addBarrier(std::shared_ptr<Waiter> waiter);
   void removeBarrier(const Waiter& waiter) { queue_.removeBarrier(waiter); }
   // Null when there are too many.
@@ -71,25 +73,25 @@ class ClientOutbox {
   // ---- the thread ----
 
   void connected();
-  // What can be sent next; empty when there is nothing.
+  // The bytes to send next; empty when there are none.
   std::string_view unsent();
-  // Also with 0, after unsent() was empty.
+  // The kernel has taken `bytes` of them. Also to be called with 0 when unsent() was empty.
   void sent(std::size_t bytes);
   void answered(const RpcFrame& response);
-  // Those who wait for an answer that was still to come are told `why`.
+  // Callers that still wait for an answer get `why`.
   void disconnected(twr_status why = TWR_NOT_CONNECTED);
   void failBarriers(twr_status status);
-  // For good. Everybody who waits for an answer is told `why`.
+  // Nothing is sent any more. All callers that wait for an answer get `why`.
   void end(twr_status why = TWR_NOT_CONNECTED);
 
   bool isEmpty() const { return queue_.empty() && batch_.empty() && toRecreate_.empty() && !hasRingData(); }
-  // The daemon is to answer something, and will as soon as it can.
+  // True while a caller waits for an answer that the daemon does not hold back.
   bool awaitsAnswers() const { return replies_.hasAwaited(); }
   bool hasSenders() const { return !senders_.empty(); }
   std::size_t queuedBytes() const { return queue_.bytes(); }
   std::uint64_t messagesSent() const { return messagesSent_; }
   std::uint64_t messagesDropped() const;
-  // Grows with every message taken out of a ring.
+  // Counts the messages taken out of rings.
   std::uint64_t ringMessages() const { return ringMessages_; }
 
  private:
@@ -103,7 +105,7 @@ class ClientOutbox {
   void encodeNext();
   void encodeMessage(Command command);
   void encodeLoss(Command command);
-  void passOver(Command command);
+  void addWithoutBytes(Command command);
   void encodeChange(Command command);
   void appendOf(twr_session& session, const RingMessage& message, OutgoingFrame& frame);
   void expand(Command reconciliation);
@@ -122,26 +124,26 @@ class ClientOutbox {
   [[nodiscard]] bool absorbUpTo(twr_sender& sender, std::uint64_t position, CommandQueue::Iterator place);
   void absorbLoss(twr_sender& sender, CommandQueue::Iterator place);
   void insert(CommandQueue::Iterator place, twr_session& session, Command command);
-  void loseBefore(CommandQueue::Iterator place, twr_session& session, std::uint64_t lost);
+  void countLossBefore(CommandQueue::Iterator place, twr_session& session, std::uint64_t lost);
   void removeSender(twr_sender& sender);
 
   void deliver(const PendingReply& reply, const std::shared_ptr<DecodedAnswer>& answer);
   void deliver(StartReplies& starts, const std::shared_ptr<DecodedAnswer>& answer);
 
   Deliveries& deliveries_;
-  const std::size_t mostReplies_;
+  const std::size_t maxReplies_;
   CommandQueue queue_;
   OutgoingBatch batch_;
   ReplyTable replies_;
-  std::vector<std::shared_ptr<twr_session>> sessions_;  // in the order of their making
-  std::size_t liveSessions_ = 0;                        // those not destroyed by their callers
+  std::vector<std::shared_ptr<twr_session>> sessions_;  // in the order in which they were made
+  std::size_t liveSessions_ = 0;                        // that their callers have not destroyed
   std::deque<std::shared_ptr<twr_session>> toRecreate_;
   std::vector<std::shared_ptr<twr_sender>> senders_;
 
-  std::size_t replyCount_ = 0;       // accepted and not yet delivered, starts' apart
-  std::size_t startReplyCount_ = 0;  // those
+  std::size_t replyCount_ = 0;       // accepted and not yet delivered, without those of starts
+  std::size_t startReplyCount_ = 0;  // those of starts
   std::uint64_t messagesSent_ = 0;
-  std::uint64_t dropped_ = 0;  // at the queue, and by rings that are no more
+  std::uint64_t dropped_ = 0;  // by the queue, and by rings that were removed
   std::uint64_t ringMessages_ = 0;
   bool isConnected_ = false;
   bool hasEnded_ = false;

@@ -16,10 +16,10 @@ namespace {
 // at any time before and after main().
 static_assert(std::is_trivially_destructible_v<Mutex>);
 constinit Mutex mutex;
-constinit ClientEngine* first GUARDED_BY(mutex) = nullptr;  // the others by their links
+constinit ClientEngine* first GUARDED_BY(mutex) = nullptr;  // the others are linked by nextClient
 constinit bool isForkObserved GUARDED_BY(mutex) = false;
 
-// Whoever forks holds all locks meanwhile, so that the child finds nothing half done, and can open them.
+// A fork holds all locks, so that the child finds consistent objects and can unlock them.
 void beforeFork() ACQUIRE(mutex) {
   mutex.lock();
   for (ClientEngine* engine = first; engine != nullptr; engine = engine->nextClient) engine->beforeFork();
@@ -37,7 +37,7 @@ void afterForkInChild() RELEASE(mutex) {
   mutex.unlock();
 }
 
-// A client that stays as long as this is held, whoever destroys it meanwhile.
+// Keeps a client alive, even if another thread destroys it meanwhile.
 struct HeldClient {
   ClientEngine* engine = nullptr;
   std::shared_ptr<void> owner;
@@ -51,7 +51,8 @@ HeldClient firstOf(Predicate isWanted) {
   return {};
 }
 
-// The library is unloaded, or the program ends. The clients' memory stays: somebody may still hold them.
+// Runs when the library is unloaded or the program ends. The clients' memory is kept, because the program may
+// still hold pointers to them.
 __attribute__((destructor)) void endThreads() {
   const auto hasThread = [](const ClientEngine& engine) { return engine.hasThread(); };
   for (HeldClient client = firstOf(hasThread); client.engine != nullptr; client = firstOf(hasThread))

@@ -6,7 +6,7 @@
 
 #include "client/ClientEngine.h"
 
-// What callers hold of a client.
+// The object behind the pointer that callers hold.
 struct twr_client {  // NOLINT(readability-identifier-naming)
   explicit twr_client(tonewerk::ClientSettings settings) : engine(std::move(settings)) {}
 
@@ -15,18 +15,21 @@ struct twr_client {  // NOLINT(readability-identifier-naming)
 
 namespace tonewerk {
 
-// A client that is in the registry and holds itself until it is destroyed. Null without memory.
+// Makes a client, adds it to the registry, and lets it keep itself alive until it is destroyed. Null without
+// memory.
 [[nodiscard]] twr_client* makeClient(ClientSettings settings);
 
-// The process's clients: for fork(), whose child has copies of them, and for the library's end.
+// Lists the process's clients. fork() needs them, because the child has copies of them, and so does the
+// unloading of the library.
 namespace clientRegistry {
 
-// False without memory for what fork() is to call.
+// False when there is no memory to register the functions that fork() calls.
 [[nodiscard]] bool add(ClientEngine& engine);
-// Its owner, which is gone when the caller drops it, unless the library's end still holds it, too.
+// Returns the client's owner. Dropping it destroys the client, unless the unloading of the library holds it,
+// too.
 [[nodiscard]] std::shared_ptr<void> remove(ClientEngine& engine);
-// Removes and destroys the clients that were destroyed inside their own callbacks and have come to their end.
-// Not inside a callback.
+// Removes and frees the clients that were destroyed inside their own callbacks and whose threads have
+// finished. Must not be called inside a callback.
 void reapDetached();
 
 }  // namespace clientRegistry

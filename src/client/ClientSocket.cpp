@@ -14,8 +14,8 @@
 namespace tonewerk {
 namespace {
 
-// While the daemon has a full queue of clients to accept.
-constexpr timeval kConnectPatience{0, 200'000};
+// How long connect() waits while the daemon's queue of clients to accept is full.
+constexpr timeval kConnectTimeout{0, 200'000};
 
 ClientSocket::Transfer failure(int error) {
   ClientSocket::Transfer transfer;
@@ -35,7 +35,7 @@ std::vector<std::string> defaultSocketPaths() { return socketPathsFrom(variable,
 int ClientSocket::open() {
   socket_.reset(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
   if (!socket_) return errno;
-  ::setsockopt(socket_.get(), SOL_SOCKET, SO_SNDTIMEO, &kConnectPatience, sizeof(kConnectPatience));
+  ::setsockopt(socket_.get(), SOL_SOCKET, SO_SNDTIMEO, &kConnectTimeout, sizeof(kConnectTimeout));
   return 0;
 }
 

@@ -10,18 +10,17 @@
 
 namespace tonewerk {
 
-// Where a daemon may listen, in the order in which to try: TONEWERK_REPORTING_SOCKET alone when it is set,
-// else in this process's own runtime directory, then in the system's. A program that runs with more rights
-// than its caller has reads no variables of the caller's.
+// Where a daemon may listen, in the order in which to try; see socketPathsFrom(). A program that runs with
+// more rights than its caller does not read the environment variables, which the caller has set.
 std::vector<std::string> defaultSocketPaths();
 
-// The client's end of a connection, as bytes. Nothing here waits but connect(), for a fifth of a second at
-// most; no signal is raised, and no program that is executed inherits the descriptor.
+// Sends and receives bytes over the client's end of a connection. Only connect() waits, for at most 200 ms.
+// No signal is raised, and executed programs do not inherit the descriptor.
 //
-// One thread at a time; close() may also be called in a child process, about its copy.
+// One thread at a time. A forked child process may call close() on its copy.
 class ClientSocket {
  public:
-  // 0 or an errno. After open(), whatever it returned, the object may be used and closed.
+  // Both return 0 or an errno. After open() the object may be used and closed, whatever it returned.
   [[nodiscard]] int open();
   [[nodiscard]] int connect(const std::string& path);
 
@@ -36,7 +35,7 @@ class ClientSocket {
   [[nodiscard]] Transfer send(std::string_view bytes);
   [[nodiscard]] Transfer receive(char* into, std::size_t size);
 
-  // No more is sent; what the daemon says can still be received.
+  // Ends the sending direction. The daemon's bytes can still be received.
   void endSending();
   void close() { socket_.reset(); }
 

@@ -16,7 +16,7 @@ bool ClientThread::start(const char* name, Function function, void* argument) {
   sigset_t all;
   sigset_t before;
   ::sigfillset(&all);
-  // The new thread has them blocked from its first instruction on.
+  // The new thread inherits the mask, so signals are blocked from its first instruction on.
   ::pthread_sigmask(SIG_SETMASK, &all, &before);
   isRunning_ = ::pthread_create(&thread_, nullptr, run, this) == 0;
   ::pthread_sigmask(SIG_SETMASK, &before, nullptr);

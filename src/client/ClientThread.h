@@ -5,7 +5,7 @@
 
 namespace tonewerk {
 
-// A thread with a name and without signals, which are the program's business.
+// Runs a thread that has a name and blocks all signals, so that the program's own threads handle them.
 //
 // This is not a std::thread because a forked child process has the object but not the thread, and must be
 // able to drop the object then. A copy stands for the same thread.
@@ -13,18 +13,18 @@ class ClientThread {
  public:
   using Function = void (*)(void* argument);
 
-  // False when there can be no thread. Once.
+  // False when no thread can be started. May be called once.
   [[nodiscard]] bool start(const char* name, Function function, void* argument);
   bool isRunning() const { return isRunning_; }
   bool isThisThread() const { return isRunning_ && ::pthread_equal(thread_, ::pthread_self()) != 0; }
-  // Waits for the thread's end; isRunning() stays. Once, and any thread but this one.
+  // Waits for the end of the thread. isRunning() stays true. May be called once, on any thread but this one.
   void join() const { ::pthread_join(thread_, nullptr); }
-  // After join(), or in a child process.
+  // Makes isRunning() false. After join(), or in a forked child process.
   void forget() { isRunning_ = false; }
 
-  // Whether the calling thread is one of these.
+  // True when the calling thread is a ClientThread.
   static bool isCurrent();
-  // In a child process that one of these has forked: the caller is an ordinary thread there.
+  // Makes the caller an ordinary thread. For a child process that a ClientThread has forked.
   static void becomeForked();
 
  private:

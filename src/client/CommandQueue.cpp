@@ -9,12 +9,12 @@
 namespace tonewerk {
 
 bool CommandQueue::hasRoomForMessage(std::size_t bytes) const {
-  return bytes_ == 0 || (bytes_ <= mostBytes_ && bytes <= mostBytes_ - bytes_);
+  return bytes_ == 0 || (bytes_ <= maxBytes_ && bytes <= maxBytes_ - bytes_);
 }
 
 bool CommandQueue::hasRoomForChange(std::size_t bytes) const {
-  const std::size_t most = mostBytes_ + kReserveBytes;
-  return bytes_ == 0 || (bytes_ <= most && bytes <= most - bytes_);
+  const std::size_t max = maxBytes_ + kReserveBytes;
+  return bytes_ == 0 || (bytes_ <= max && bytes <= max - bytes_);
 }
 
 Command& CommandQueue::add(Command command) { return insert(commands_.end(), std::move(command)); }

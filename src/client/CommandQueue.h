@@ -16,8 +16,8 @@
 
 namespace tonewerk {
 
-// A caller that waits, under the engine's mutex. It is shared, because a caller that forks away leaves one
-// behind that must never be destroyed: it still has a waiter.
+// Lets a caller wait for the thread. The engine's mutex guards it. It is shared, because in a forked child
+// the copy of a condition that a thread of the parent waits for must never be destroyed.
 struct Waiter {
   Condition condition;
   bool isDone = false;
@@ -30,71 +30,70 @@ struct Waiter {
   }
 };
 
-// How far a ring had been written when something was asked for: so far it goes out before.
+// How far a ring was written when a command was queued. The messages up to there are sent before the command.
 struct RingMark {
   std::shared_ptr<twr_sender> sender;
   std::uint64_t position = 0;
-  bool isClosed = false;  // already: nothing more was to come
+  bool isClosed = false;  // the sender was closed by then
 };
 
-// Something that waits to be sent.
+// A piece of work that waits to be sent.
 struct Command {
   enum class Kind {
     kMessage,    // `message`, the bytes of its payload in `body`
-    kLoss,       // nothing but what `session` has lost and no message has told, if there is something
+    kLoss,       // the losses of `session` that no message has reported, if there are any
     kRequest,    // `body`
     kChange,     // `change` of `session`
-    kReconcile,  // whatever leads `session` to `wanted`
-    kBarrier,    // nothing; tells `waiter` that all before it has gone out
+    kReconcile,  // the changes that lead `session` to `wanted`
+    kBarrier,    // sends nothing; finishes `waiter` when all before it was sent
   };
 
   Kind kind = Kind::kMessage;
-  std::shared_ptr<twr_session> session;  // null for the client's own
+  std::shared_ptr<twr_session> session;  // null for commands of the client itself
   RingMessage message{};
-  std::vector<std::int64_t> reporterIDs;  // of a message without a session
+  std::vector<std::int64_t> reporterIDs;  // for a message without a session
   std::string body;
   PendingReply reply;
   std::vector<RingMark> marks;
   std::unique_ptr<SessionChange> change;
   std::unique_ptr<SessionState> wanted;
   std::shared_ptr<Waiter> waiter;
-  std::size_t bytes = 0;  // what it counts for in the queue's bound
+  std::size_t bytes = 0;  // how many it counts in the queue's bound
 
-  std::uint64_t lostBefore = 0;  // of the session, when it was asked for
-  std::uint64_t lostAfter = 0;   // of messages that were taken, and would have come next
+  std::uint64_t lostBefore = 0;  // the session's losses when the command was queued
+  std::uint64_t lostAfter = 0;   // messages that a ring had taken and that would have come next
 };
 
-// What a command takes in memory next to what it points at: with its place in the queue's list.
+// The memory that a command takes in the queue's list, without what it points to.
 inline constexpr std::size_t kCommandBytes = sizeof(Command) + 2 * sizeof(void*);
 
-// What waits to be sent, in order, up to a number of bytes. Commands that are being sent count until they
-// have gone out. Under the engine's mutex.
+// Holds the commands that wait to be sent, in order, up to a number of bytes. Commands that are being sent
+// count until they were sent. The engine's mutex guards the queue.
 class CommandQueue {
  public:
   using Iterator = std::list<Command>::iterator;
 
-  // What there is beyond the bound for requests that change a session, so that messages do not crowd them
-  // out.
+  // Room beyond the bound for requests that change a session, so that messages do not displace them.
   static constexpr std::size_t kReserveBytes = std::size_t{64} * 1024;
 
-  explicit CommandQueue(std::size_t mostBytes) : mostBytes_(mostBytes) {}
+  explicit CommandQueue(std::size_t maxBytes) : maxBytes_(maxBytes) {}
 
-  // What alone is larger than the bound finds room where there is nothing else.
+  // A command that is larger than the bound finds room in an empty queue.
   bool hasRoomForMessage(std::size_t bytes) const;
   bool hasRoomForChange(std::size_t bytes) const;
 
   // Counts command.bytes. The reference is valid until the command is taken out.
   Command& add(Command command);
-  // Before `place`; the bound is the caller's business.
+  // Inserts before `place` without checking the bound.
   Command& insert(Iterator place, Command command);
-  // Counts nothing: what comes back has never stopped counting.
+  // Puts a command back to the front. Its bytes still count, so none are added.
   void putBack(Command command);
-  // The first. It goes on counting until released().
+  // Takes out the first command. Its bytes count until released().
   [[nodiscard]] Command take();
   void released(std::size_t bytes) { bytes_ -= bytes; }
-  // One that is here, and counts no longer.
+  // Removes a command of this queue and its bytes.
   void remove(const Command& command);
-  // The one that `waiter` waits for, if it is still here.
+  // Removes the barrier of `waiter`, if it is still here.
   void removeBarrier(const Waiter& waiter);
   [[nodiscard]] std::list<Command> takeAll();
 
@@ -107,7 +106,7 @@ class CommandQueue {
  private:
   void removeAt(Iterator place);
 
-  std::size_t mostBytes_;
+  std::size_t maxBytes_;
   std::size_t bytes_ = 0;
   std::list<Command> commands_;
 };

@@ -13,11 +13,11 @@
 
 namespace tonewerk {
 
-// An answer as callers of the C interface see it, with the memory that it points into.
+// Holds an answer of the C interface and the memory that it points into.
 class DecodedAnswer {
  public:
   explicit DecodedAnswer(twr_status status);
-  // Of a response. A result of another kind than expected leaves the members for it as they are without one.
+  // Reads a response. A result of an unexpected kind counts as none.
   explicit DecodedAnswer(const RpcFrame& response);
 
   // Valid until the next call, and as long as this object.
@@ -34,11 +34,11 @@ class DecodedAnswer {
   std::vector<std::int64_t> reporterIDs_;
 };
 
-// One call of a caller's function that is to be made once no lock is held.
+// A call of a caller's function that is to be made once no lock is held.
 struct Delivery {
   PendingReply reply;
   std::shared_ptr<DecodedAnswer> answer;
-  std::optional<twr_state> state;  // instead of an answer: the client's new state
+  std::optional<twr_state> state;  // the client's new state, instead of an answer
 };
 
 using Deliveries = std::vector<Delivery>;

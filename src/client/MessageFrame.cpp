@@ -13,12 +13,12 @@ namespace {
 constexpr std::string_view kTimestamp = "twreporting_timestamp";
 constexpr std::string_view kDropped = "twreporting_dropped";
 
-// Reads one object and remembers whether it is the time stamp's name.
+// Reads one object and notes whether it is the name of the time stamp.
 class NameVisitor : public msgpack::null_visitor {
  public:
   bool isTimestamp() const { return isTimestamp_; }
 
-  // What the library calls, by its names.
+  // The library calls these, so it has chosen their names.
   bool visit_str(const char* text, std::uint32_t size) {
     isTimestamp_ = depth_ == 0 && std::string_view(text, size) == kTimestamp;
     return true;
@@ -42,7 +42,8 @@ class NameVisitor : public msgpack::null_visitor {
   int depth_ = 0;
 };
 
-// A program may have scribbled over its payload: what is no MessagePack is left for the daemon to refuse.
+// A program may have overwritten its payload. Bytes that are not MessagePack are sent, and the daemon refuses
+// them.
 bool hasTimestampEntry(std::string_view bytes) {
   try {
     bool isName = true;
@@ -58,7 +59,7 @@ bool hasTimestampEntry(std::string_view bytes) {
 }
 
 bool isStamped(std::string_view bytes) {
-  // Nearly no payload has the text anywhere, and looking for that costs next to nothing.
+  // Few payloads contain the text at all, and the search is cheap.
   return bytes.find(kTimestamp) != std::string_view::npos && hasTimestampEntry(bytes);
 }
 
@@ -69,21 +70,21 @@ std::size_t appendMessageFrame(std::string& out, std::optional<std::uint32_t> re
                                std::span<const std::int64_t> reporterIDs) {
   const std::string_view bytes(reinterpret_cast<const char*>(message.bytes.data()), message.bytes.size());
   const bool stamps = !isStamped(bytes);
-  const bool tellsLoss = dropped > 0;
+  const bool reportsLoss = dropped > 0;
 
   RpcWriter(out).head(requestIdentifier);
   StringOutput output{out};
   RpcPacker packer(output);
   packer.text(requests::kSendMessage.name);
   packer.pack_array(4);
-  packer.pack_map(message.entries + (stamps ? 1U : 0U) + (tellsLoss ? 1U : 0U));
+  packer.pack_map(message.entries + (stamps ? 1U : 0U) + (reportsLoss ? 1U : 0U));
   const std::size_t payloadAt = out.size();
   out.append(bytes);
   if (stamps) {
     packer.text(kTimestamp);
     packer.number(message.time);
   }
-  if (tellsLoss) {
+  if (reportsLoss) {
     packer.text(kDropped);
     packer.pack_uint64(dropped);
   }

@@ -20,7 +20,7 @@ constexpr std::size_t aligned(std::size_t bytes) {
 
 std::size_t capacityFor(std::size_t bytes) {
   return std::bit_ceil(
-      std::clamp(bytes, MessageRing::kLeastBytes, static_cast<std::size_t>(TWR_MOST_RING_BYTES)));
+      std::clamp(bytes, MessageRing::kMinBytes, static_cast<std::size_t>(TWR_MOST_RING_BYTES)));
 }
 
 }  // namespace

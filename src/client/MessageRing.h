@@ -13,9 +13,9 @@
 
 namespace tonewerk {
 
-// How many messages a session has lost so far: of its queue and of its senders' rings, whichever. What is
-// taken remembers the count, and so how much was lost before it, in whatever order it goes out. Any thread;
-// no lock, no allocation, no system call.
+// Counts the messages that a session has lost, in its queue and in its senders' rings. Each message that is
+// taken keeps the count of that moment, and so the number of losses before it, in whatever order messages are
+// sent. Any thread may call it; it takes no lock, allocates nothing and makes no system call.
 class LossCount {
  public:
   void add(std::uint32_t category) {
@@ -32,17 +32,18 @@ class LossCount {
   std::atomic<std::uint32_t> lastCategory_{0};
 };
 
-// How many of them the messages that go out have told.
-struct ToldLosses {
-  std::uint64_t counted = 0;  // of the count
-  std::uint64_t late = 0;     // messages that were taken first and lost later; not part of the count
+// Counts the losses that sent messages have reported already.
+struct ReportedLosses {
+  std::uint64_t counted = 0;   // up to this value of LossCount
+  std::uint64_t lostLate = 0;  // lost after they were taken; LossCount does not contain them
 
-  bool owes(std::uint64_t lostBefore) const { return late > 0 || lostBefore > counted; }
-  // What a message tells before which so many were lost.
+  bool hasUnreported(std::uint64_t lostBefore) const { return lostLate > 0 || lostBefore > counted; }
+  // Returns how many losses a message reports, when `lostBefore` were lost before it, and counts them as
+  // reported.
   std::uint64_t take(std::uint64_t lostBefore) {
-    std::uint64_t told = std::exchange(late, 0);
-    if (lostBefore > counted) told += lostBefore - std::exchange(counted, lostBefore);
-    return told;
+    std::uint64_t number = std::exchange(lostLate, 0);
+    if (lostBefore > counted) number += lostBefore - std::exchange(counted, lostBefore);
+    return number;
   }
 };
 
@@ -51,47 +52,48 @@ struct RingMessage {
   std::uint32_t category;
   std::uint16_t type;
   double time;                           // seconds since 1970
-  std::uint64_t lostBefore;              // of its session, since that was made
-  std::uint32_t entries;                 // of its map, which `bytes` hold one after the other
+  std::uint64_t lostBefore;              // losses of its session before it, since the session was made
+  std::uint32_t entries;                 // how many entries its map has; `bytes` contains them
   std::span<const unsigned char> bytes;  // MessagePack, without the map's header
 };
 
-// The wall clock to a few milliseconds, which no system call answers whatever the clock source is.
+// The wall clock, precise to a few milliseconds. Reading it makes no system call, whatever the clock source
+// is.
 double coarseSeconds();
 
-// What a real-time thread says, until a background thread takes it.
+// Holds the messages of a real-time thread until a background thread takes them.
 //
 //   producer: push() ...            consumer: front(), pop(), front(), pop() ...
 //
-// One thread at a time on each side. Wait-free on both: neither ever waits for the other, and the producer
-// makes no system call, takes no lock and allocates nothing. A message that finds no room is dropped and
-// counted, here and as the session's.
+// One thread at a time may use each side. Both sides are wait-free: neither ever waits for the other, and the
+// producer makes no system call, takes no lock and allocates nothing. A message that finds no room is dropped
+// and counted, here and in the session.
 class MessageRing {
  public:
-  // A message's own, next to its bytes, which are rounded up to a multiple of kAlignmentBytes.
+  // A message takes a header and its bytes, rounded up to a multiple of kAlignmentBytes.
   static constexpr std::size_t kHeaderBytes = 32;
   static constexpr std::size_t kAlignmentBytes = 8;
-  static constexpr std::size_t kLeastBytes = 64;
+  static constexpr std::size_t kMinBytes = 64;
 
-  // Rounds up to a power of two of at least kLeastBytes and at most TWR_MOST_RING_BYTES, and touches the
-  // memory, so that no page of it is missing later. `losses` outlives the producer.
+  // Rounds `bytes` up to a power of two from kMinBytes to TWR_MOST_RING_BYTES. Touches the memory, so that no
+  // page fault happens later. `losses` outlives the producer.
   MessageRing(std::size_t bytes, LossCount& losses);
   MessageRing(const MessageRing&) = delete;
   MessageRing& operator=(const MessageRing&) = delete;
 
   std::size_t capacity() const { return memory_.size(); }
 
-  // Producer. TWR_OK; TWR_FULL for now; TWR_TOO_LARGE for ever; TWR_INVALID for a list; the payload's
-  // problem. Whatever is not taken counts as dropped.
+  // Producer. Returns TWR_OK; TWR_FULL when there is no room at present; TWR_TOO_LARGE when there never can
+  // be; TWR_INVALID for a list; or the payload's problem. A message that is not taken counts as dropped.
   [[nodiscard]] twr_status push(std::uint32_t category, std::uint16_t type, const twr_payload& payload);
 
-  // Consumer. The oldest message, and the same again until pop(); its bytes are valid until then.
+  // Consumer. The oldest message; the same one until pop(). Its bytes are valid until then.
   [[nodiscard]] std::optional<RingMessage> front();
-  // Consumer, after front() gave one.
+  // Consumer. Removes the message that front() returned.
   void pop();
 
-  // Any thread. Positions grow for ever: everything written before is read once readPosition() has come to
-  // what writtenPosition() was.
+  // Any thread. Positions only grow. All messages from before a call of writtenPosition() were read once
+  // readPosition() has reached its result.
   std::uint64_t writtenPosition() const { return written_.load(std::memory_order_acquire); }
   std::uint64_t readPosition() const { return read_.load(std::memory_order_acquire); }
   std::uint64_t dropped() const { return dropped_.load(std::memory_order_acquire); }
@@ -105,8 +107,8 @@ class MessageRing {
   void copyOut(std::uint64_t position, void* to, std::size_t size) const;
   std::span<const unsigned char> bytesAt(std::uint64_t position, std::size_t size);
 
-  // What one side writes lies apart from what the other does, so that neither pulls the other's cache line
-  // away; each looks at the other's position only when its own copy of it says that there is nothing to do.
+  // The two sides write to different cache lines, so that they do not slow each other down. Each side reads
+  // the other's position only when its own copy of it says that there is no room, or no message.
   static constexpr std::size_t kCacheLineBytes = 64;
 
   std::vector<unsigned char> memory_;
@@ -119,7 +121,8 @@ class MessageRing {
   alignas(kCacheLineBytes) std::atomic<std::uint64_t> read_{0};
   std::uint64_t seenWritten_ = 0;
   std::size_t frontBytes_ = 0;
-  std::vector<unsigned char> joined_;  // the bytes of a front that goes over the ring's end
+  std::vector<unsigned char>
+      joined_;  // a copy of the front message's bytes when they wrap around the ring's end
 };
 
 }  // namespace tonewerk

@@ -48,7 +48,7 @@ std::vector<OutgoingFrame> OutgoingBatch::takeBack() {
 }
 
 void OutgoingBatch::clear() {
-  // One large frame's memory is not kept for ever.
+  // The memory of a large frame is not kept.
   if (bytes_.capacity() > 2 * kFullBytes) bytes_ = std::string();
   bytes_.clear();
   sent_ = 0;

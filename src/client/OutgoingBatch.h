@@ -14,32 +14,33 @@
 
 namespace tonewerk {
 
-// One frame that is on its way, and what is needed to take it back should it not get there.
+// A frame that is being sent, with what is needed to take it back when the connection breaks before it was
+// sent.
 struct OutgoingFrame {
-  // kRecreation says again what the daemon had been told before; it needs no second time.
+  // kRecreation repeats what the daemon was told on an earlier connection; it is not put back into the queue.
   enum class Origin { kQueue, kRing, kRecreation };
 
   Origin origin = Origin::kQueue;
-  Command command;         // of a ring without its body, which is in the batch:
-  std::size_t bodyAt = 0;  // there
+  Command command;  // for a ring without its body, which is in the batch's bytes from here:
+  std::size_t bodyAt = 0;
   std::size_t bodyBytes = 0;
   std::uint32_t identifier = 0;  // of a request; 0 for a notification
-  // Of what changes a session: how it was before.
+  // For a change of a session: its state before.
   std::unique_ptr<SessionState> stateBefore;
   std::shared_ptr<StartReplies> startsBefore;
   std::size_t startCountBefore = 0;
   bool isMessage = false;
-  // Of what a session is told or says: how its losses had been told before.
-  std::uint64_t toldBefore = 0;
-  std::uint64_t lateTold = 0;
+  // For all frames of a session: how many of its losses were reported before.
+  std::uint64_t reportedBefore = 0;
+  std::uint64_t lateReported = 0;
 
   std::optional<std::uint32_t> optionalIdentifier() const {
     return identifier == 0 ? std::nullopt : std::optional(identifier);
   }
 };
 
-// Frames that are handed to the kernel in one piece, as far as it takes them. A frame has gone out when its
-// last byte has.
+// Collects frames that are given to the kernel together, as far as it takes them. A frame is sent when its
+// last byte is.
 class OutgoingBatch {
  public:
   // Enough frames for one write.
@@ -47,17 +48,17 @@ class OutgoingBatch {
 
   bool isFull() const { return bytes_.size() >= kFullBytes; }
   bool empty() const { return frames_.empty(); }
-  // What is left to be sent.
+  // The bytes that are still to be sent.
   std::string_view unsent() const { return std::string_view(bytes_).substr(sent_); }
 
-  // A frame's bytes are appended here first, and then the frame added.
+  // A frame's bytes are appended here before add() is called.
   std::string& bytes() { return bytes_; }
   void add(OutgoingFrame frame);
 
-  // The kernel has taken so many bytes more. The frames that have thereby gone out, in order.
+  // The kernel has taken `count` more bytes. Returns the frames that are sent with them, in order.
   [[nodiscard]] std::vector<OutgoingFrame> sent(std::size_t count);
 
-  // The frames that have not gone out, in order; those of rings with their bodies. Nothing is left.
+  // Takes out all frames that are not sent, in order. Those of rings get their bodies back.
   [[nodiscard]] std::vector<OutgoingFrame> takeBack();
 
  private:

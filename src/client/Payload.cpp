@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
-// The payload functions of the C interface run on real-time threads: everything is written straight into the
-// caller's memory, and an entry counts only once it is whole. What reads payloads does not, and allocates.
+// The payload functions of the C interface run on real-time threads: they write directly into the caller's
+// memory, and an entry counts only once it is complete. The functions that read payloads do not run there,
+// and allocate.
 #include "client/Payload.h"
 
 #include <cstring>
@@ -15,12 +16,12 @@
 namespace tonewerk {
 namespace {
 
-// MessagePack's 32-bit headers: a marker and the number of entries, which grows with each of them.
+// MessagePack's 32-bit headers: a marker and the number of entries, which is increased with each entry.
 constexpr unsigned char kMap32 = 0xDF;
 constexpr unsigned char kArray32 = 0xDD;
 constexpr std::uint32_t kContainerHeaderBytes = 5;
 
-// The rest of a payload's memory.
+// Writes into the rest of a payload's memory.
 class Room {
  public:
   explicit Room(const twr_payload& payload)
@@ -70,7 +71,7 @@ bool isEntryText(std::string_view text) {
   return text.size() <= std::numeric_limits<std::uint32_t>::max() && isText(text);
 }
 
-// Puts what `write` packs, under `name` where this is a map.
+// Puts the value that `write` packs, in a map under `name`.
 template <class Write>
 twr_status put(twr_payload* payload, const char* name, Write write) {
   if (payload == nullptr) return TWR_INVALID;
@@ -101,7 +102,7 @@ twr_status open(twr_payload* payload, const char* name, unsigned char marker) {
   if (payload == nullptr) return TWR_INVALID;
   if (payload->problem != TWR_OK) return static_cast<twr_status>(payload->problem);
   if (payload->depth == TWR_MOST_PAYLOAD_DEPTH) return mark(*payload, TWR_INVALID);
-  // The map's or list's own entry, empty so far; the packer would choose a shorter header for that.
+  // Writes the empty map or list with a 32-bit header. The packer would choose a shorter one.
   const auto header = [&](Packer& packer) {
     const char bytes[kContainerHeaderBytes] = {static_cast<char>(marker)};
     packer.raw(bytes, sizeof(bytes));
@@ -190,7 +191,7 @@ twr_status twr_put_text_n(twr_payload* payload, const char* name, const char* va
 }
 
 twr_status twr_put_date(twr_payload* payload, const char* name, double seconds) {
-  constexpr double kTwoTo63 = 9223372036854775808.0;  // what a date's whole seconds are below
+  constexpr double kTwoTo63 = 9223372036854775808.0;  // a date's whole seconds are less than this
   const bool isDate = seconds >= -kTwoTo63 && seconds < kTwoTo63;
   if (payload != nullptr && payload->problem == TWR_OK && !isDate) {
     return tonewerk::mark(*payload, TWR_INVALID);

@@ -11,22 +11,22 @@
 
 namespace tonewerk {
 
-// Of twr_payload::flags: the outermost container is a list, for a request's parameters.
+// A flag of twr_payload::flags: the outermost container is a list, for a request's parameters.
 inline constexpr std::uint32_t kPayloadIsList = 1;
 
-// Why a message or a configuration cannot be made of `payload`; TWR_OK for nothing.
+// Why `payload` cannot be a message or a configuration; TWR_OK when it can.
 [[nodiscard]] inline twr_status problemOfMap(const twr_payload& payload) {
   const twr_status problem = twr_payload_problem(&payload);
   if (problem != TWR_OK) return problem;
   return (payload.flags & kPayloadIsList) == 0 ? TWR_OK : TWR_INVALID;
 }
 
-// Appends what a request or a notification of `method` has after its head, with a list payload for its
-// parameters; null for none.
+// Appends the part of a request or a notification that follows its head: the method and its parameters, which
+// are a list payload, or null for none.
 void appendRequestBody(std::string& out, std::string_view method, const twr_payload* parameters);
 
-// A payload's entries as a map; none when they are not what the protocol carries, which only happens when
-// somebody else wrote into the payload's memory.
+// Reads a payload's entries as a map. None when they are not valid, which only happens when the program wrote
+// into the payload's memory.
 [[nodiscard]] std::optional<ValueMap> mapOf(const twr_payload& payload);
 
 }  // namespace tonewerk

@@ -7,7 +7,7 @@
 namespace tonewerk {
 
 std::uint32_t ReplyTable::add(Entry entry) {
-  // A session may run for longer than it takes to use all numbers up once. 0 stands for none.
+  // A session may run for so long that all numbers were used once. 0 stands for none.
   while (next_ == 0 || entries_.contains(next_)) ++next_;
   entries_.emplace(next_, std::move(entry));
   return next_++;

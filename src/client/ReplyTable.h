@@ -12,45 +12,45 @@
 
 namespace tonewerk {
 
-// What a request's result is, and so which members of the answer it fills.
+// The kind of a request's result. It decides which members of the answer are filled.
 enum class AnswerKind { kPlain, kServiceType, kValidity, kReporters };
 
-// Whom to call with a request's answer; nobody when `function` is null.
+// The function to call with a request's answer; none when `function` is null.
 struct PendingReply {
   twr_reply function = nullptr;
   void* context = nullptr;
   AnswerKind kind = AnswerKind::kPlain;
   bool isStart = false;    // waits for a session's stop
-  bool mayBeHeld = false;  // by the daemon, for as long as it likes: the end does not wait for it
+  bool mayBeHeld = false;  // the daemon may hold the answer back; the end of the client does not wait for it
 
   explicit operator bool() const { return function != nullptr; }
 };
 
-// Those who wait for one run of a session to stop: the start's caller, and whoever started the session again
-// while it was started, to whom the daemon says nothing.
+// The callers that wait for one run of a session to stop: the caller of the start, and callers that started
+// the session again while it was started, which the daemon does not answer.
 struct StartReplies {
   std::vector<PendingReply> waiting;
 };
 
-// Who waits for what on one connection, by the requests' identifiers.
+// Holds the replies that wait for an answer on one connection, by the requests' identifiers.
 class ReplyTable {
  public:
   struct Entry {
     PendingReply reply;
-    // Of a start, whose answer is theirs; and of what ends a run, with whose answer at the latest they are
-    // told.
+    // For a start: the callers that get its answer. For a request that ends a run: the callers that are
+    // called with its answer at the latest.
     std::shared_ptr<StartReplies> starts;
     bool isStart = false;
   };
 
-  // The identifier that the request is to be sent with.
+  // Returns the identifier with which the request must be sent.
   [[nodiscard]] std::uint32_t add(Entry entry);
-  // None when nobody waits: an answer to nothing, or the second of two.
+  // None when no reply waits for this identifier, as for a second answer.
   [[nodiscard]] std::optional<Entry> take(std::uint32_t identifier);
-  // In the order of the requests. A new connection begins anew.
+  // Takes out all, in the order of the requests, and starts the identifiers again for a new connection.
   [[nodiscard]] std::vector<Entry> takeAll();
 
-  // Somebody waits for an answer that the daemon gives as soon as it can.
+  // True while a reply waits for an answer that the daemon does not hold back.
   bool hasAwaited() const;
   std::size_t size() const { return entries_.size(); }
 

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-// A header alone, for programs of ours that have values, whichever way their requests reach the daemon.
+// Header only. For our own programs that use values, whichever way their requests reach the daemon.
 #include <chrono>
 #include <deque>
 #include <functional>
@@ -16,7 +16,7 @@
 
 namespace tonewerk {
 
-// What came back for a request: an error, or a result (none for nil).
+// The answer to a request: an error, or a result (none for nil).
 struct Answer {
   std::optional<ReplyError> error;
   std::optional<Value> result;
@@ -24,11 +24,11 @@ struct Answer {
 
 using AnswerHandler = std::function<void(const Answer& answer)>;
 
-// One connection to the daemon, for one thread.
+// Sends requests over one connection to the daemon. For one thread.
 //
 // Requests are answered in the order in which they complete; a start's answer only comes with the session's
 // stop, so answers go to handlers. Handlers run inside processAnswers() and call(), never inside request().
-// Those still waiting when the connection ends are dropped.
+// Handlers that still wait when the connection ends are dropped.
 class RpcClient {
  public:
   RpcClient() = default;
@@ -36,17 +36,17 @@ class RpcClient {
   RpcClient& operator=(const RpcClient&) = delete;
   virtual ~RpcClient() = default;
 
-  // For poll(): readable when answers wait or the daemon is gone. -1 when not connected.
+  // For poll(): readable when there are answers or the connection has ended. -1 when not connected.
   virtual int fileDescriptor() const = 0;
 
-  // Sends a request. Waits, at most 10 s, while the daemon reads nothing. std::errc::message_size and
-  // std::errc::invalid_argument for what no frame can carry: nothing is then sent.
+  // Sends a request. Waits at most 10 s while the daemon does not read. std::errc::message_size and
+  // std::errc::invalid_argument when no frame can contain the arguments; nothing is then sent.
   [[nodiscard]] virtual std::error_code request(std::string_view method, const Arguments& arguments,
                                                 AnswerHandler handler) = 0;
 
-  // Waits up to `timeout` for something to arrive, then runs the handlers of all answers that are there.
-  // Fails when the connection is gone; std::errc::timed_out when nothing came (with a zero time-out: no
-  // error).
+  // Waits up to `timeout` for answers, then runs the handlers of all that have arrived. Fails when the
+  // connection has ended. std::errc::timed_out when no answer has arrived; with a time-out of zero that is no
+  // error.
   [[nodiscard]] std::error_code processAnswers(std::chrono::milliseconds timeout) {
     using std::chrono::milliseconds;
     const std::error_code error = receive(arrived_.empty() ? timeout : milliseconds::zero());
@@ -60,8 +60,8 @@ class RpcClient {
     return hasAnswers || isNothing ? std::error_code() : error;
   }
 
-  // Sends a request and waits for its answer; handlers of others that arrive before it run. None on failure
-  // or after `timeout`; `error` says which.
+  // Sends a request and waits for its answer. Handlers of other answers that arrive before it run. None on
+  // failure or after `timeout`, with the reason in `error`.
   [[nodiscard]] std::optional<Answer> call(std::string_view method, const Arguments& arguments,
                                            std::chrono::milliseconds timeout, std::error_code& error) {
     using std::chrono::milliseconds;
@@ -77,19 +77,18 @@ class RpcClient {
   }
 
  protected:
-  // An answer, and who waited for it.
+  // An answer and the handler that waits for it.
   struct Arrival {
     AnswerHandler handler;
     Answer answer;
   };
 
-  // Waits up to `timeout` for something to arrive, and says by arrive() which answers did.
-  // std::errc::timed_out when nothing came; std::errc::not_connected, or why the connection is of no more
-  // use.
+  // Waits up to `timeout` for answers and passes those that have arrived to arrive(). std::errc::timed_out
+  // when there were none; std::errc::not_connected, or the error that ended the connection.
   [[nodiscard]] virtual std::error_code receive(std::chrono::milliseconds timeout) = 0;
   void arrive(Arrival arrival) { arrived_.push_back(std::move(arrival)); }
   bool hasArrivals() const { return !arrived_.empty(); }
-  // The connection ends, and with it what came over it. Also inside a handler, which is then the last one.
+  // Drops the answers when the connection ends. May be called inside a handler, which is then the last one.
   void dropArrivals() { arrived_.clear(); }
 
  private:

@@ -17,8 +17,8 @@ class ClientEngine;
 struct Command;
 }  // namespace tonewerk
 
-// What callers hold of a session, and what the client knows of it. It stays, without its caller, until the
-// daemon has been told of its end.
+// The object behind a caller's pointer to a session, with what the client knows of the session. After its
+// caller has destroyed it, it is kept until the daemon was told so.
 //
 // Everything but `engine`, `identifier` and `losses` is guarded by the engine's mutex.
 struct twr_session : std::enable_shared_from_this<twr_session> {  // NOLINT(readability-identifier-naming)
@@ -28,25 +28,25 @@ struct twr_session : std::enable_shared_from_this<twr_session> {  // NOLINT(read
   tonewerk::ClientEngine& engine;
   const std::int64_t identifier;
 
-  // As the caller last asked for it, and as the daemon has been told.
+  // The state that the caller last asked for, and the state that was sent to the daemon.
   tonewerk::SessionState wanted;
   tonewerk::SessionState sent;
   bool isDestroyed = false;  // by its caller
 
-  // Those who wait for the present run to stop; null when nobody does.
+  // The callers that wait for the present run to stop; null when there are none.
   std::shared_ptr<tonewerk::StartReplies> starts;
 
   tonewerk::LossCount losses;
-  tonewerk::ToldLosses told;
+  tonewerk::ReportedLosses reported;
   std::size_t queued = 0;  // commands that wait in the queue
   std::size_t unsent = 0;  // frames that are being sent
-  // The last command in the queue, when it is one that leads to a state; nothing of the session follows it.
+  // The session's last command in the queue, if it is a reconciliation.
   tonewerk::Command* lastReconciliation = nullptr;
 
-  std::vector<std::shared_ptr<twr_sender>> senders;  // closed ones, too, until their rings are empty
+  std::vector<std::shared_ptr<twr_sender>> senders;  // also closed ones, until their rings are empty
 };
 
-// What a real-time thread holds.
+// The object behind a real-time thread's pointer to a sender.
 struct twr_sender {  // NOLINT(readability-identifier-naming)
   twr_sender(const std::shared_ptr<twr_session>& owner, const std::atomic<bool>& isForked, std::size_t bytes)
       : session(owner), hasForked(isForked), ring(bytes, owner->losses) {}
@@ -54,7 +54,7 @@ struct twr_sender {  // NOLINT(readability-identifier-naming)
   const std::weak_ptr<twr_session> session;
   const std::atomic<bool>& hasForked;
   tonewerk::MessageRing ring;
-  // Under the engine's mutex.
+  // The engine's mutex guards these two.
   bool isClosed = false;
-  std::uint64_t lostAtClose = 0;  // of the session
+  std::uint64_t lostAtClose = 0;  // the session's losses at that time
 };

@@ -13,8 +13,9 @@ using Kind = SessionChange::Kind;
 
 namespace {
 
-// The daemon takes the second for the first where a configuration brings it alone. Told again, merged with
-// what came before, the first would win.
+// If a configuration has only the second name, the daemon uses its value for the first. When the merged
+// configuration is sent again, it has both, and the daemon would use the first. So the value is stored under
+// the first name as well.
 constexpr std::string_view kApplicationName = "HostApplicationDisplayID";
 constexpr std::string_view kOtherApplicationName = "QMHostApplicationDisplayID";
 

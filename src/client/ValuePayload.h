@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-// A header alone and on top of the C interface, for programs of ours that have values and link the library as
-// strangers do.
+// Header only, on top of the C interface. For our own programs that use values and link the library as other
+// programs do.
 #include <cstddef>
 #include <string>
 #include <vector>
@@ -15,7 +15,7 @@ namespace tonewerk {
 
 [[nodiscard]] inline twr_status putValue(twr_payload* payload, const char* name, const Value& value);
 
-// TWR_INVALID for a name with a zero byte in it, which the C interface could only cut off.
+// TWR_INVALID for a name that contains a zero byte, because the C interface would cut it off there.
 [[nodiscard]] inline twr_status putEntries(twr_payload* payload, const ValueMap& map) {
   for (const ValueMapEntry& entry : map) {
     const std::string name(entry.key);
@@ -33,7 +33,7 @@ namespace tonewerk {
   return TWR_OK;
 }
 
-// Puts `value` and all that it holds. After a failure containers may be open.
+// Puts `value` and all that it contains. After a failure, containers may be open.
 [[nodiscard]] inline twr_status putValue(twr_payload* payload, const char* name, const Value& value) {
   twr_status status = TWR_OK;
   switch (value.kind()) {
@@ -63,12 +63,12 @@ namespace tonewerk {
   return status == TWR_OK ? twr_close(payload) : status;
 }
 
-// A payload of values, in memory that grows as they need.
+// Builds a payload of values, in memory that grows as needed.
 class ValuePayload {
  public:
   ValuePayload() : memory_(kFirstBytes) {}
 
-  // What a message or a configuration is. Fails as the C interface does; the payload is then of no use.
+  // Builds a message or a configuration. Fails as the C interface does; the payload must then not be sent.
   twr_status set(const ValueMap& map) {
     return fill([&] {
       twr_payload_init(&payload_, memory_.data(), memory_.size());
@@ -76,7 +76,7 @@ class ValuePayload {
     });
   }
 
-  // A request's parameters.
+  // Builds a request's parameters.
   twr_status set(const Arguments& arguments) {
     return fill([&] {
       twr_payload_init_list(&payload_, memory_.data(), memory_.size());
@@ -92,7 +92,8 @@ class ValuePayload {
 
  private:
   static constexpr std::size_t kFirstBytes = 4096;
-  static constexpr std::size_t kMaxBytes = std::size_t{2} << 20;  // no frame of the protocol holds as much
+  static constexpr std::size_t kMaxBytes = std::size_t{2}
+                                           << 20;  // more than a frame of the protocol can contain
 
   template <class Fill>
   [[nodiscard]] twr_status fill(Fill once) {

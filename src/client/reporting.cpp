@@ -1,5 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
-// The C interface to clients, sessions and senders: arguments are checked here, and no exception passes.
+// Implements the C interface to clients, sessions and senders. It checks the arguments and lets no exception
+// through.
 #include "tonewerk/reporting.h"
 
 #include <algorithm>
@@ -28,7 +29,7 @@ namespace {
 using std::chrono::milliseconds;
 using Kind = SessionChange::Kind;
 
-// Runs what may run out of memory.
+// Runs `function`; returns `otherwise` when it throws, as without memory.
 template <class Result, class Function>
 Result guarded(Result otherwise, Function function) noexcept {
   try {
@@ -45,7 +46,7 @@ twr_status guarded(Function function) noexcept {
 
 ClientSettings settingsOf(const twr_client_options* given) {
   twr_client_options options{};
-  // A caller may know of fewer members than there are.
+  // A caller that was built with an older version knows fewer members.
   if (given != nullptr) std::memcpy(&options, given, std::min(given->size, sizeof(options)));
   ClientSettings settings;
   const bool isChosen = options.socket_path != nullptr && *options.socket_path != '\0';
@@ -80,7 +81,7 @@ twr_status problemOfMessage(const twr_payload* payload, std::size_t reporterIDs)
   return fitsMessageFrame(payload->size, reporterIDs) ? TWR_OK : TWR_TOO_LARGE;
 }
 
-// Positive, and none of the small numbers that people choose.
+// Returns a positive number that is larger than numbers that people choose.
 std::int64_t randomIdentifier() {
   std::uint64_t bits = 0;
   if (::getrandom(&bits, sizeof(bits), GRND_NONBLOCK) != sizeof(bits)) {
@@ -227,7 +228,7 @@ twr_status twr_client_request(twr_client* client, const char* method, const twr_
     if (body.size() + RpcWriter::kMaxHeadBytes > kMaxFrameBytes) return TWR_TOO_LARGE;
     return client->engine.request([&](ClientOutbox& outbox) {
       PendingReply pending{reply, context};
-      pending.mayBeHeld = true;  // who knows what method that is
+      pending.mayBeHeld = true;  // the method is not known here
       return outbox.request(std::move(body), pending);
     });
   });
@@ -285,7 +286,7 @@ twr_status twr_session_stop(twr_session* session, twr_reply reply, void* context
 
 twr_status twr_session_destroy(twr_session* session, twr_reply reply, void* context) {
   if (session == nullptr) return TWR_INVALID;
-  // In a child process the copy stays until its client's goes.
+  // In a forked child the copy is kept until the copy of its client is destroyed.
   if (session->engine.hasForked()) return TWR_FORKED;
   return guarded([&] {
     return session->engine.withOutbox([&](ClientOutbox& outbox) {

@@ -97,7 +97,7 @@ TEST_F(ClientEngineTest, ConnectsWhenAskedTo) {
 TEST_F(ClientEngineTest, SaysThatThereIsNoDaemon) {
   daemon.reset();
   ClientSettings chosen = settings(path);
-  chosen.firstDelay = chosen.mostDelay = milliseconds(1'000'000);
+  chosen.firstDelay = chosen.maxDelay = milliseconds(1'000'000);
   makeClientWith(chosen);
   EXPECT_EQ(twr_client_connect(client, kScriptPatienceMs), TWR_NOT_CONNECTED);
   EXPECT_EQ(info().state, TWR_STATE_WAITING);
@@ -377,7 +377,7 @@ TEST_F(ClientEngineTest, DropsTheRestWhenTheTimeIsUp) {
 TEST_F(ClientEngineTest, IsDestroyedAtOnceWithoutADaemon) {
   daemon.reset();
   ClientSettings chosen = settings(path);
-  chosen.firstDelay = chosen.mostDelay = milliseconds(1'000'000);
+  chosen.firstDelay = chosen.maxDelay = milliseconds(1'000'000);
   makeClientWith(chosen);
   session = twr_session_create(client, 77);
   twr_session_start(session, AnswerLog::note, log.as("stopped"));
@@ -400,7 +400,7 @@ TEST_F(ClientEngineTest, CarriesAMessageThatIsLargerThanItsQueue) {
 // Were the delay not reset, the last of these would come after minutes.
 TEST_F(ClientEngineTest, ComesBackSoonToADaemonThatAnswers) {
   ClientSettings chosen = settings(path);
-  chosen.mostDelay = milliseconds(1'000'000);
+  chosen.maxDelay = milliseconds(1'000'000);
   makeClientWith(chosen);
   for (int at = 0; at < 20; ++at) {
     ASSERT_EQ(twr_client_get_all_reporters(client, AnswerLog::note, log.as("all")), TWR_OK);
@@ -553,7 +553,7 @@ long waitsOfClientThread() {
 TEST_F(ClientEngineTest, IsNotWokenByWhatOnlyWaitsForADaemon) {
   daemon.reset();
   ClientSettings chosen = settings(path);
-  chosen.firstDelay = chosen.mostDelay = milliseconds(1'000'000);
+  chosen.firstDelay = chosen.maxDelay = milliseconds(1'000'000);
   chosen.queueBytes = std::size_t{16} * 1024 * 1024;
   makeClientWith(chosen);
   session = twr_session_create(client, 77);

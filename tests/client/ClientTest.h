@@ -87,7 +87,7 @@ class ClientTest : public testing::Test {
     ClientSettings chosen;
     chosen.socketPaths = {path};
     chosen.firstDelay = std::chrono::milliseconds(1);
-    chosen.mostDelay = std::chrono::milliseconds(4);
+    chosen.maxDelay = std::chrono::milliseconds(4);
     chosen.busyPoll = std::chrono::milliseconds(1);
     chosen.idlePoll = std::chrono::milliseconds(1);
     return chosen;

@@ -54,7 +54,7 @@ TEST(MessageRingTest, HasNothingAtFirst) {
 }
 
 TEST(MessageRingTest, RoundsItsSizeUpToAPowerOfTwo) {
-  EXPECT_EQ(Ring(0).capacity(), MessageRing::kLeastBytes);
+  EXPECT_EQ(Ring(0).capacity(), MessageRing::kMinBytes);
   EXPECT_EQ(Ring(4096).capacity(), 4096U);
   EXPECT_EQ(Ring(4097).capacity(), 8192U);
   EXPECT_EQ(Ring(SIZE_MAX).capacity(), std::size_t{TWR_MOST_RING_BYTES});

@@ -45,10 +45,10 @@ constexpr int kNotPermitted = 3;
 constexpr int kMiscounted = 4;
 
 // Compilers may leave out an allocation whose result goes nowhere.
-void* volatile theMemory = nullptr;
+void* volatile allocatedMemory = nullptr;
 
 // What the traps have to catch.
-const std::map<std::string, std::function<void()>>& misdeeds() {
+const std::map<std::string, std::function<void()>>& forbiddenActions() {
   static void* const memory = std::malloc(16);
   static std::mutex mutex;
   static std::shared_mutex sharedMutex;
@@ -59,12 +59,12 @@ const std::map<std::string, std::function<void()>>& misdeeds() {
   sem_init(&semaphore, 0, 1);
   static const std::map<std::string, std::function<void()>> all = {
       {"send", [] {}},
-      {"malloc", [] { theMemory = std::malloc(16); }},
-      {"calloc", [] { theMemory = std::calloc(1, 16); }},
-      {"realloc", [] { theMemory = std::realloc(memory, 32); }},
+      {"malloc", [] { allocatedMemory = std::malloc(16); }},
+      {"calloc", [] { allocatedMemory = std::calloc(1, 16); }},
+      {"realloc", [] { allocatedMemory = std::realloc(memory, 32); }},
       {"free", [] { std::free(memory); }},
-      {"aligned_alloc", [] { theMemory = std::aligned_alloc(64, 64); }},
-      {"new", [] { theMemory = ::operator new(16); }},
+      {"aligned_alloc", [] { allocatedMemory = std::aligned_alloc(64, 64); }},
+      {"new", [] { allocatedMemory = ::operator new(16); }},
       {"delete", [] { ::operator delete(memory); }},
       {"mutex", [] { mutex.lock(); }},
       {"rwlock", [] { sharedMutex.lock_shared(); }},
@@ -106,7 +106,7 @@ class Reader {
 
 struct Run {
   twr_sender* sender = nullptr;
-  const std::function<void()>* misdeed = nullptr;
+  const std::function<void()>* forbiddenAction = nullptr;
   bool forbidsSystemCalls = true;
   int problem = 0;  // why they cannot be
   std::uint64_t sent = 0;
@@ -143,7 +143,7 @@ void* sendAll(void* given) {
   if (run.problem == 0) {
     traps_begin();
     for (std::uint32_t number = 0; number < kMessages; ++number) {
-      if (number == kMessages / 2) (*run.misdeed)();
+      if (number == kMessages / 2) (*run.forbiddenAction)();
       sendOne(run, number);
     }
     traps_end();
@@ -208,11 +208,11 @@ int runAll(Run& run, const std::string& socketPath) {
 }  // namespace
 
 int main(int count, char** arguments) {
-  const auto& all = misdeeds();
+  const auto& all = forbiddenActions();
   const auto chosen = count > 2 ? all.find(arguments[2]) : all.end();
   if (chosen == all.end()) return kCannot;
   Run run;
-  run.misdeed = &chosen->second;
+  run.forbiddenAction = &chosen->second;
   run.forbidsSystemCalls = count == 3;
   traps_prepare();
   return runAll(run, arguments[1]);
