@@ -14,7 +14,7 @@ namespace {
 
 constexpr std::chrono::seconds kAnswerTimeout{10};
 
-// Whether nothing was sent, because no frame can carry it.
+// True when nothing was sent, because no frame can contain the arguments.
 bool isTooLarge(const std::error_code& error) {
   return error == std::errc::message_size || error == std::errc::invalid_argument;
 }
@@ -25,9 +25,9 @@ bool DaemonCalls::connect(Role role) {
   const std::vector<std::string> paths = tool_.socketPaths();
   const std::error_code error = client_.connect(paths);
   if (!error) {
-    // A daemon too old to know the request says so, and works as without it; one that is gone shows with the
-    // next request.
-    if (role == Role::kOnlooker) static_cast<void>(client_.request(requests::kObserve.name, {}, {}));
+    // An older daemon that does not know the request answers with an error and works as before. If the
+    // connection has ended, the next request fails.
+    if (role == Role::kOnlooker) (void)client_.request(requests::kObserve.name, {}, {});
     return true;
   }
   std::string tried;
@@ -55,7 +55,7 @@ bool DaemonCalls::call(std::string_view method, const Arguments& arguments, std:
 std::optional<Value> DaemonCalls::await(std::string_view method, const Arguments& arguments,
                                         const std::function<bool(int descriptor)>& waitReadable,
                                         std::optional<DaemonFailure>& failure) {
-  // Shared, because who gives up leaves the handler behind.
+  // Shared, because the handler stays when the caller gives up.
   const auto answer = std::make_shared<std::optional<Answer>>();
   std::error_code error =
       client_.request(method, arguments, [answer](const Answer& given) { *answer = given; });

@@ -12,19 +12,20 @@
 
 namespace tonewerk {
 
-// Why there is no result, and how the tool ends then.
+// Why there is no result, and the tool's exit status for it.
 struct DaemonFailure {
   ExitStatus status;
   std::string problem;
 };
 
-// A command's connection to the daemon. What goes wrong is printed and becomes the tool's exit status.
+// Makes a command's requests to the daemon. Prints each failure and sets the tool's exit status.
 class DaemonCalls {
  public:
   // `tool` outlives it.
   explicit DaemonCalls(Tool& tool) : tool_(tool) {}
 
-  // An onlooker asks and changes nothing; the daemon refuses what would, and keeps no record of its visit.
+  // An onlooker only reads. The daemon refuses its requests that would change something, and records nothing
+  // of its connection.
   enum class Role { kClient, kOnlooker };
 
   // False when no daemon listens.
@@ -33,8 +34,8 @@ class DaemonCalls {
   // The answer's result (none for nil) in `result`. False when the request was refused or not answered.
   [[nodiscard]] bool call(std::string_view method, const Arguments& arguments, std::optional<Value>& result);
 
-  // The same for an answer that may be long in coming, with nothing printed: `waitReadable` waits until the
-  // descriptor is readable, or says false to give up. None, then or with a `failure`.
+  // The same for an answer that may take long, without printing. `waitReadable` waits until the descriptor is
+  // readable, or returns false to give up. None when it gave up, or on a failure, which is then in `failure`.
   [[nodiscard]] std::optional<Value> await(std::string_view method, const Arguments& arguments,
                                            const std::function<bool(int descriptor)>& waitReadable,
                                            std::optional<DaemonFailure>& failure);

@@ -21,7 +21,7 @@ using std::chrono::milliseconds;
 constexpr milliseconds kConnectTimeout{10'000};
 constexpr milliseconds kSendTimeout{10'000};
 constexpr milliseconds kCloseTimeout{1'000};
-// A recording without pauses is sent much faster than it is carried out.
+// Large, because a recording without pauses is sent much faster than the daemon processes it.
 constexpr std::size_t kQueueBytes = std::size_t{4} << 20;
 
 std::error_code errorOf(twr_status status) {
@@ -44,7 +44,7 @@ std::error_code errorOf(twr_status status) {
 
 }  // namespace
 
-// What has arrived. The library's thread puts, the caller's takes.
+// Holds the answers that have arrived. The library's thread puts them, the caller's thread takes them.
 class DaemonConnection::Inbox {
  public:
   enum class Wait { kArrived, kGone, kTimedOut };
@@ -56,7 +56,7 @@ class DaemonConnection::Inbox {
   int fileDescriptor() const { return event_.fileDescriptor(); }
 
   void put(AnswerHandler handler, const twr_answer& answer) {
-    // Who is connected no more gets no answer; that the connection is gone is told by itself.
+    // The connection has ended, so this is no answer. end() reports that.
     if (answer.status != TWR_OK && answer.status != TWR_REFUSED) return;
     Answer read;
     if (answer.status == TWR_REFUSED) {
@@ -76,7 +76,7 @@ class DaemonConnection::Inbox {
     event_.signal();
   }
 
-  // Does not wait, whatever it says: kTimedOut is that there is nothing.
+  // Does not wait. kTimedOut means that there is nothing.
   Wait state() {
     const MutexLock lock(mutex_);
     if (!arrived_.empty()) return Wait::kArrived;
@@ -96,7 +96,7 @@ class DaemonConnection::Inbox {
 
   std::deque<Arrival> takeAll() {
     const MutexLock lock(mutex_);
-    // A connection that is gone stays readable.
+    // After the end of the connection the descriptor stays readable.
     if (!isGone_) event_.clear();
     return std::exchange(arrived_, {});
   }
@@ -111,7 +111,7 @@ class DaemonConnection::Inbox {
   bool isGone_ GUARDED_BY(mutex_) = false;
 };
 
-// The library's client.
+// Owns the library's client.
 class DaemonConnection::Library {
  public:
   Library(const std::string& path, Inbox& inbox) : inbox_(inbox) {
@@ -176,7 +176,8 @@ DaemonConnection::DaemonConnection() = default;
 DaemonConnection::~DaemonConnection() = default;
 
 std::error_code DaemonConnection::connect(const std::vector<std::string>& paths) {
-  // The first place at which there is something says more than the last, at which there may be nothing.
+  // Return the error of the first path at which there is a socket, rather than that there is none at the last
+  // path.
   std::error_code problem = std::make_error_code(std::errc::no_such_file_or_directory);
   for (const std::string& path : paths) {
     library_.reset();

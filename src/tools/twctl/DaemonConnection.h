@@ -12,15 +12,15 @@
 
 namespace tonewerk {
 
-// A connection through the client library, whose answers come on a thread of its own and wait until they are
-// asked for.
+// Connects through the client library. Answers arrive on the library's thread and wait until the caller takes
+// them.
 class DaemonConnection : public RpcClient {
  public:
   DaemonConnection();
   ~DaemonConnection() override;
 
-  // Connects to the first path on which somebody listens; once. The error is that of the first path at which
-  // there is something, else std::errc::no_such_file_or_directory.
+  // Connects to the first path on which a daemon listens. May be called once. The error is that of the first
+  // path at which there is a socket, otherwise std::errc::no_such_file_or_directory.
   [[nodiscard]] std::error_code connect(const std::vector<std::string>& paths);
 
   int fileDescriptor() const override;
@@ -33,7 +33,7 @@ class DaemonConnection : public RpcClient {
 
   [[nodiscard]] std::error_code receive(std::chrono::milliseconds timeout) override;
 
-  std::unique_ptr<Inbox> inbox_;  // outlives the library's client, which puts into it
+  std::unique_ptr<Inbox> inbox_;  // outlives the library's client, which puts answers into it
   std::unique_ptr<Library> library_;
 };
 

@@ -12,15 +12,15 @@ namespace tonewerk {
 
 class JsonService;
 
-// How twctl ends.
+// The exit statuses of twctl.
 enum ExitStatus : int {
   kDone = 0,
-  kRefused = 1,     // refused, not valid, not there, or not to be written
-  kWrongUsage = 2,  // a bad recording included
-  kNoDaemon = 3,    // nobody answers
+  kRefused = 1,     // refused, not valid, not found, or cannot be written
+  kWrongUsage = 2,  // also a bad recording
+  kNoDaemon = 3,    // no daemon answers
 };
 
-// What every command works with: where to print, and what the common options say.
+// Holds what every command needs: the output streams and the common options.
 struct Tool {
   std::ostream& out;
   std::ostream& err;
@@ -28,16 +28,16 @@ struct Tool {
   bool asJson = false;      // --json
   bool systemWide = false;  // --system
   bool outIsTerminal = false;
-  int inDescriptor = -1;   // where keys come from; -1 for nowhere
-  int outDescriptor = -1;  // of `out`; -1 when it is no file
-  int status = kDone;      // of the command that ran
+  int inDescriptor = -1;   // the descriptor to read keys from; -1 for none
+  int outDescriptor = -1;  // the descriptor of `out`; -1 when it is not a file
+  int status = kDone;      // the exit status of the command that ran
 
   // Prints "twctl: <problem>" and returns `failure`.
   [[nodiscard]] int fail(ExitStatus failure, std::string_view problem) const;
-  // Prints "twctl: warning: <problem>": it has been done all the same.
+  // Prints "twctl: warning: <problem>", for a problem that did not stop the command.
   void warn(std::string_view problem) const;
 
-  // Of the caller, or of the system's daemon.
+  // The caller's directories, or, with --system, those of the system's daemon.
   Directories directories() const;
   // Where to look for the daemon, in this order.
   std::vector<std::string> socketPaths() const;

@@ -6,7 +6,7 @@
 
 namespace tonewerk {
 
-// What the adapters that the tool uses have to say goes to people, errors only.
+// Prints the errors that the adapters log, for people.
 class ToolLog final : public Log {
  public:
   explicit ToolLog(const Tool& tool) : tool_(tool) {}

@@ -43,7 +43,7 @@ void showChannels(Tool& tool, const ChannelsOptions& options) {
   }
 }
 
-// What is wrong with the interval, or an empty text.
+// Reads the interval. Returns the problem, or an empty text.
 std::string takeInterval(const std::string& text, ChannelsOptions& options) {
   std::string problem = problemWithSeconds(text);
   if (problem.empty()) options.seconds = valueOfArgument(text).number();
@@ -60,7 +60,7 @@ void addChannelsCommand(CLI::App& app, Tool& tool) {
       "is\n"
       "named, and the exit status is then 1.");
   const auto options = std::make_shared<ChannelsOptions>();
-  // Nothing else is called for an option whose value is left out.
+  // The parser calls no other function for an option whose value is left out.
   command.parse_complete_callback([&command, options] { options->watches = command.count("--watch") > 0; });
   command.add_option("--driver", options->filter.driver, "Only of drivers that this pattern fits");
   command.add_option("--group", options->filter.group, "Only of groups that this pattern fits");

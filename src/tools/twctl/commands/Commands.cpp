@@ -46,14 +46,14 @@ int runCommandLine(int argc, const char* const* argv, Tool& tool) {
   try {
     app.parse(argc, argv);
   } catch (const CLI::ParseError& error) {
-    // Help is such an error, too.
+    // The parser reports --help and --version in this way, too.
     const bool isAnswer = error.get_exit_code() == 0;
     tool.status =
         isAnswer ? app.exit(error, tool.out, tool.err) : tool.fail(kWrongUsage, usageProblem(app, error));
   } catch (const std::exception& error) {
     return tool.fail(kRefused, error.what());
   }
-  // A full disk, say: half of a list must not pass for all of it.
+  // For example on a full disk. A list that is cut off must not look complete.
   if (!tool.out.flush() && tool.status == kDone) return tool.fail(kRefused, "cannot write the output");
   return tool.status;
 }

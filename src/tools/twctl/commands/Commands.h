@@ -11,8 +11,8 @@ class App;
 
 namespace tonewerk {
 
-// The tool's commands, one file each. Adding one to `app` declares its arguments; when the command line names
-// it, it runs and leaves its exit status in `tool`, which outlives `app`.
+// Add the tool's commands, each of which has a file of its own, to `app` and declare their arguments. A
+// command runs when the command line names it, and sets the exit status in `tool`, which outlives `app`.
 void addListCommand(CLI::App& app, Tool& tool);
 void addValidateCommand(CLI::App& app, Tool& tool);
 void addSendCommand(CLI::App& app, Tool& tool);
@@ -25,17 +25,17 @@ void addPowerCommand(CLI::App& app, Tool& tool);
 void addRtcCommand(CLI::App& app, Tool& tool);
 void addDefaultsCommand(CLI::App& app, Tool& tool);
 void addNotifyCommand(CLI::App& app, Tool& tool);
-// captures, drafts and whirlcaps.
+// Adds captures, drafts and whirlcaps.
 void addDiagnosticsCommands(CLI::App& app, Tool& tool);
 void addChannelsCommand(CLI::App& app, Tool& tool);
 void addPathsCommand(CLI::App& app, Tool& tool);
 void addKillCommand(CLI::App& app, Tool& tool);
 
-// A command with the options that all have.
+// Adds a command with the common options.
 CLI::App& addCommand(CLI::App& app, Tool& tool, const std::string& name, const std::string& description);
 void addCommonOptions(CLI::App& app, Tool& tool);
 
-// Reads the command line and runs what it asks for. The exit status.
+// Reads the command line, runs its command and returns the exit status.
 [[nodiscard]] int runCommandLine(int argc, const char* const* argv, Tool& tool);
 
 }  // namespace tonewerk

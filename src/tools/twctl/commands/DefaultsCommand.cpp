@@ -28,7 +28,7 @@ struct DefaultsOptions {
   std::string value;
 };
 
-// The preference files, with or without a daemon.
+// Opens the preference files, with or without a daemon.
 class Preferences {
  public:
   explicit Preferences(const Tool& tool)
@@ -52,7 +52,7 @@ struct Entry {
   const char* from;
 };
 
-// Those that the daemon knows in the order of its schema, then those that it does not.
+// Lists the keys that the daemon knows in the order of its schema, then the others.
 std::vector<Entry> entriesOf(const std::string& domain, const TomlPreferenceStore::Layers& layers) {
   std::vector<Entry> entries;
   const auto add = [&](const std::string& key, const Preference* known) {
@@ -75,7 +75,7 @@ std::vector<Entry> entriesOf(const std::string& domain, const TomlPreferenceStor
   return entries;
 }
 
-// As it is written, where a boolean's text would be a number.
+// Writes a boolean as in the file; its text() would be a number.
 const char* wordOf(bool value) { return value ? "true" : "false"; }
 
 Table::Cell cellOf(const std::optional<Value>& value) {
@@ -95,7 +95,7 @@ void read(Tool& tool, const DefaultsOptions& options) {
     return;
   }
   {
-    // The value last: it may be long.
+    // The value is last, because it may be long.
     Table table(tool.out, tool.asJson, {"key", "from", "value"});
     for (const Entry& entry : entries) table.add({Value(entry.key), Value(entry.from), cellOf(entry.value)});
   }
@@ -106,7 +106,8 @@ void read(Tool& tool, const DefaultsOptions& options) {
   }
 }
 
-// A daemon that follows the preference looks at it again. Without a runtime directory none runs.
+// Notifies a daemon that watches the preference, so that it reads it again. Without a runtime directory no
+// daemon runs.
 void announce(const Tool& tool, const DefaultsOptions& options) {
   const std::optional<std::string> notification = notificationOfPreference(options.domain, *options.key);
   const std::string runtime = tool.directories().runtime;
@@ -118,14 +119,14 @@ void announce(const Tool& tool, const DefaultsOptions& options) {
   }
 }
 
-// What the store says of a change that it refused.
+// Announces a change, or prints why the store has refused it.
 void finish(Tool& tool, const DefaultsOptions& options, const std::error_code& error,
             const std::string& problem) {
   if (!error) return announce(tool, options);
   tool.status = tool.fail(kRefused, problem.empty() ? error.message() : problem);
 }
 
-// What is typed for a text is that text, also where it could be read as something else.
+// For a preference that is a text, the argument is that text, even if it could be read as another type.
 Value valueToWrite(const DefaultsOptions& options) {
   const Preference* known = findPreference(options.domain, *options.key);
   const std::optional<Value> value = parseTomlValue(options.value);
@@ -171,7 +172,7 @@ std::string defaultText(const Preference& preference) {
   return boolean == nullptr ? preference.fallback->text() : wordOf(*boolean);
 }
 
-// A block a preference: what is said of one is too long for a row.
+// Prints a block for each preference, because a description is too long for a row.
 void describeToPeople(std::ostream& out, const std::vector<const Preference*>& preferences) {
   std::string_view domain;
   for (const Preference* preference : preferences) {
@@ -219,7 +220,7 @@ std::shared_ptr<DefaultsOptions> addAction(CLI::App& command, Tool& tool, Action
   return options;
 }
 
-// The same of a domain that must be there.
+// Adds an action whose domain is required.
 std::shared_ptr<DefaultsOptions> addActionOnDomain(CLI::App& command, Tool& tool, Action action) {
   auto options = addAction(command, tool, action);
   command.get_option("DOMAIN")->required();

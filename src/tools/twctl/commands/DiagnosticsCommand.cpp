@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// captures, drafts, whirlcaps: what diagnostics left on the disk.
+// The commands captures, drafts and whirlcaps, which show and delete what diagnostics have stored.
 #include <CLI/CLI.hpp>
 #include <iomanip>
 #include <memory>
@@ -20,7 +20,7 @@ namespace {
 
 constexpr const char* kRequestFile = "request.json";
 
-// One of the three commands, and what its command line says.
+// One of the three commands with its arguments.
 struct DiagnosticsCommand {
   DiagnosticKind kind;
   std::string noun;  // of one item
@@ -33,7 +33,7 @@ using Entry = DiagnosticsDirectory::Entry;
 
 DiagnosticsDirectory directoryOf(const Tool& tool) { return DiagnosticsDirectory(tool.directories().state); }
 
-// False when the items cannot be read; then that is said.
+// False when the items cannot be read; the problem is then printed.
 bool canRead(Tool& tool, const DiagnosticsDirectory& directory, DiagnosticKind kind) {
   const std::error_code error = directory.checkReadable(kind);
   if (!error) return true;
@@ -62,7 +62,7 @@ void printField(std::ostream& out, const char* name, const std::string& value) {
   if (!value.empty()) out << "  " << std::left << std::setw(10) << name << value << '\n';
 }
 
-// What fits on a screen, cut between characters.
+// The beginning of a text that fits on a screen, cut between characters.
 std::string beginningOf(const std::string& text) {
   constexpr std::size_t kMax = 1000;
   const std::string_view beginning = shortened(text, kMax);
@@ -113,7 +113,7 @@ void printForPrograms(std::ostream& out, const DiagnosticsDirectory& directory,
   table.add({Value(name), Value(directory.pathOf(command.kind, name)), Value(files), {json, json}});
 }
 
-// Which item is meant; none when there is no such, which is then said.
+// The item that the command line names. None when it does not exist; the problem is then printed.
 std::optional<std::string> nameOf(Tool& tool, const DiagnosticsDirectory& directory,
                                   const DiagnosticsCommand& command) {
   if (command.latest == !command.names.empty()) {
@@ -140,7 +140,7 @@ void show(Tool& tool, const DiagnosticsCommand& command) {
   (tool.asJson ? printForPrograms : printForPeople)(tool.out, directory, command, *name, request);
 }
 
-// Goes on with the others when one cannot be deleted.
+// Deletes the others when one cannot be deleted.
 void remove(Tool& tool, const DiagnosticsCommand& command) {
   if (command.all == !command.names.empty()) {
     tool.status = tool.fail(kWrongUsage, "either IDs or --all");

@@ -31,7 +31,7 @@ class EventPrinter {
 
   bool print(StoreReader& reader, EventFilter& filter) {
     const bool done = reader.readEvents(filter, [&](const StoredEvent& event) {
-      // The payload is JSON as it is.
+      // The payload is JSON already.
       table_.add({Value(event.id),
                   Table::Cell::time(event.recordedAt),
                   Value(event.name),
@@ -64,11 +64,11 @@ void printEvents(Tool& tool, EventFilter filter, bool follow) {
   EventPrinter printer(tool);
   StoreReader reader;
   if (!open(tool, reader, follow) || !printer.print(reader, filter)) return;
-  filter.limit.reset();  // of what was there at the beginning
+  filter.limit.reset();  // it is for the events that exist at the start
   while (follow && tool.out) {
     std::this_thread::sleep_for(kFollowInterval);
     if (reader.hasMoved()) {
-      // A damaged store was moved aside, and a new one begun.
+      // The daemon has moved a damaged store aside and made a new one.
       if (!open(tool, reader, true)) return;
       filter.afterId = 0;
     }

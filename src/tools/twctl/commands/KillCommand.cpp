@@ -12,7 +12,7 @@ namespace {
 
 constexpr std::chrono::seconds kEndTimeout{30};
 
-// There is no answer: the connection ends with the daemon.
+// A daemon that ends does not answer; its connection ends.
 void kill(Tool& tool) {
   DaemonCalls daemon(tool);
   if (!daemon.connect(DaemonCalls::Role::kClient)) return;

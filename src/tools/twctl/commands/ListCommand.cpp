@@ -22,7 +22,7 @@ void list(Tool& tool) {
   for (const Value& identifier : *identifiers) {
     std::optional<AudioServiceType> serviceType;
     if (!lookUpSession(daemon, identifier.integer(), serviceType)) return;
-    // One that has gone since then is left out.
+    // A session that has ended since then is left out.
     if (serviceType) table.add(identifier.integer(), *serviceType);
   }
 }

@@ -18,14 +18,14 @@ constexpr std::array kSignals{SIGINT, SIGTERM, SIGHUP, SIGQUIT, SIGWINCH};
 constexpr char kStop = 's';
 constexpr char kResize = 'r';
 
-// Where the handler writes; -1 while nobody listens.
+// The pipe that the signal handler writes to; -1 without a LiveEvents.
 volatile std::sig_atomic_t handlersPipe = -1;
 std::array<struct sigaction, kSignals.size()> before;
 
 extern "C" void noteSignal(int number) {
   const int savedError = errno;
   const char byte = number == SIGWINCH ? kResize : kStop;
-  // A full pipe has enough to say already.
+  // A full pipe already has signals to read.
   static_cast<void>(!::write(handlersPipe, &byte, 1));
   errno = savedError;
 }
@@ -42,7 +42,8 @@ int millisecondsUntil(const std::optional<LiveEvents::Time>& until) {
 LiveEvents::LiveEvents(int in, int out) : in_(in), out_(out) {
   assert(handlersPipe == -1);
   std::array<int, 2> ends{-1, -1};
-  if (::pipe2(ends.data(), O_CLOEXEC | O_NONBLOCK) != 0) return;  // signals then do what they always do
+  if (::pipe2(ends.data(), O_CLOEXEC | O_NONBLOCK) != 0)
+    return;  // without a pipe, signals end the process as usual
   signals_ = FileDescriptor(ends[0]);
   handlersPipe = ends[1];
   for (std::size_t at = 0; at < kSignals.size(); ++at) {
@@ -62,7 +63,7 @@ LiveEvents::~LiveEvents() {
 
 LiveEvents::Event LiveEvents::wait(int readable, std::optional<Time> until) {
   while (!isStopped_) {
-    // poll() passes over descriptors that are negative.
+    // poll() ignores negative descriptors.
     std::array<pollfd, 4> polled{
         {{signals_.get(), POLLIN, 0}, {out_, 0, 0}, {in_, POLLIN, 0}, {readable, POLLIN, 0}}};
     const int count = ::poll(polled.data(), polled.size(), millisecondsUntil(until));
@@ -90,7 +91,7 @@ std::optional<LiveEvents::Event> LiveEvents::takeSignal() {
 
 bool LiveEvents::takeKey() {
   const ssize_t count = ::read(in_, &key_, 1);
-  if (count == 0) in_ = -1;  // its end; it would be ready for ever
+  if (count == 0) in_ = -1;  // the end of the input, which would always be readable
   if (count < 0 && errno != EINTR && errno != EAGAIN) in_ = -1;
   return count == 1;
 }

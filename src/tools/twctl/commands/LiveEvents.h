@@ -8,33 +8,34 @@
 
 namespace tonewerk {
 
-// What a command that runs until it is stopped waits for.
+// Waits for the events of a command that runs until it is stopped.
 //
-// While there is one, the first SIGINT, SIGTERM, SIGHUP or SIGQUIT is an event; a second one ends the process
-// at once, whatever it waits for. One at a time, on one thread.
+// While an object exists, the first SIGINT, SIGTERM, SIGHUP or SIGQUIT is an event; a second one of the same
+// kind ends the process at once. There may be one object at a time, used on one thread.
 class LiveEvents {
  public:
   using Time = std::chrono::steady_clock::time_point;
 
   enum class Event {
-    kTime,      // nothing else happened by then
-    kReadable,  // the descriptor asked for
-    kKey,       // key() has it
-    kResized,   // the terminal
-    kStopped,   // by a signal, or nobody reads the output any more
+    kTime,      // the time has come
+    kReadable,  // the descriptor is readable
+    kKey,       // a key was pressed; key() returns it
+    kResized,   // the terminal has another size
+    kStopped,   // by a signal, or because the reader of the output has closed it
   };
 
-  // Keys come from `in`, and `out` is watched for its reader's end; -1 for neither.
+  // Reads keys from `in`, and watches `out` for the end of its reader. -1 for none.
   LiveEvents(int in, int out);
   LiveEvents(const LiveEvents&) = delete;
   LiveEvents& operator=(const LiveEvents&) = delete;
-  // Signals do again what they did before.
+  // Restores the previous signal handlers.
   ~LiveEvents();
 
-  // Waits for what comes first: `readable` (-1 for none) to be so, or the time. Once stopped, always stopped.
+  // Waits until `readable` (-1 for none) is readable, the time has come, or another event. After kStopped it
+  // always returns kStopped.
   [[nodiscard]] Event wait(int readable, std::optional<Time> until);
 
-  // The last key that wait() told of.
+  // The last key for which wait() has returned kKey.
   char key() const { return key_; }
 
  private:
@@ -43,7 +44,7 @@ class LiveEvents {
 
   int in_;
   const int out_;
-  FileDescriptor signals_;  // a byte for each that came
+  FileDescriptor signals_;  // receives a byte for each signal
   bool isStopped_ = false;
   char key_ = 0;
 };

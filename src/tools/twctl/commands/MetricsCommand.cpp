@@ -28,7 +28,7 @@ std::string hexOf(std::string_view bytes) {
   return text;
 }
 
-// The record's fields; its bytes in hexadecimal when it is of another kind than we know, or damaged.
+// The record's fields, or its bytes in hexadecimal when the record is of an unknown kind or damaged.
 Value decoded(const StoredMetric& metric) {
   AudioIssueDetected record;
   ProtozeroReader reader(metric.record);

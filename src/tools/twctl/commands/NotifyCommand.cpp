@@ -31,12 +31,12 @@ std::string problemWithState(const std::string& text) {
   return parseState(text) ? "" : "\"" + text + "\" is no number from 0 to 18446744073709551615";
 }
 
-// The notifications' files, with or without a daemon.
+// Opens the notifications' files, with or without a daemon.
 NotificationFiles filesOf(const Tool& tool) {
   return NotificationFiles(tool.directories().runtime + "/notifications");
 }
 
-// Whether it is a name; says so when it is none.
+// False when `name` cannot name a notification; the problem is then printed.
 bool takeName(Tool& tool, const std::string& name) {
   if (NotificationHandlers::isName(name)) return true;
   tool.status = tool.fail(kRefused, "\"" + name + "\" cannot name a notification");

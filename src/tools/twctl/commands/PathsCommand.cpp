@@ -16,7 +16,7 @@ namespace {
 
 using NamedPath = std::pair<std::string, std::string>;
 
-// A daemon may listen in several places, which are looked at in this order.
+// There may be several sockets. Clients try them in this order.
 std::vector<NamedPath> pathsOf(const Tool& tool) {
   const Directories directories = tool.directories();
   std::vector<NamedPath> paths{{"store", directories.state + "/" + std::string(kStoreFileName)},

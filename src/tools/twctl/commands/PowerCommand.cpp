@@ -23,7 +23,7 @@ bool printEvents(Tool& tool, StoreReader& reader, const EventFilter& filter) {
               tool.asJson ? std::vector<std::string>{"id", "recorded_at", "event_group", "name", "payload"}
                           : std::vector<std::string>{"id", "time", "group", "name", "payload"});
   return reader.readPowerEvents(filter, [&](const StoredPowerEvent& event) {
-    // The payload is JSON as it is.
+    // The payload is JSON already.
     table.add({Value(event.id),
                Table::Cell::time(event.recordedAt),
                Value(event.group),
@@ -37,7 +37,7 @@ Table::Cell applicationCell(const EngineOnTotal& total) {
   return Value(*total.application);
 }
 
-// `head` comes before the first total.
+// Prints `head` before the first total.
 bool printTotals(Tool& tool, StoreReader& reader, const EventFilter& filter, const std::string& head) {
   Table table(tool.out, tool.asJson, {"ApplicationName", "EngineOnDuration", "events"});
   bool isFirst = true;
@@ -48,7 +48,7 @@ bool printTotals(Tool& tool, StoreReader& reader, const EventFilter& filter, con
   });
 }
 
-// Programs get lines of one kind.
+// For programs, all lines are of the same kind.
 bool print(Tool& tool, StoreReader& reader, const EventFilter& filter, bool totalsOnly) {
   if (totalsOnly) return printTotals(tool, reader, filter, "");
   return printEvents(tool, reader, filter) && (tool.asJson || printTotals(tool, reader, filter, "\n"));

@@ -14,7 +14,7 @@ using std::chrono::milliseconds;
 using std::chrono::steady_clock;
 
 constexpr milliseconds kAnswerTimeout{30'000};
-// So that a time in the far future, or a speed close to 0, still is a time.
+// Bounds a time in the far future, or a speed close to 0, to a value that the clock can represent.
 constexpr double kLongestWaitSeconds = 1e9;
 
 double secondsSince1970() {
@@ -42,7 +42,7 @@ std::error_code RecordingPlayer::play(const Recording& recording) {
 std::error_code RecordingPlayer::waitUntil(steady_clock::time_point time) {
   for (;;) {
     const auto left = std::chrono::ceil<milliseconds>(time - steady_clock::now());
-    // Also without a pause: unread answers would in the end make the daemon stop reading.
+    // Also without a pause, because the daemon stops reading when too many answers are unread.
     const std::error_code error = daemon_.processAnswers(std::max(left, milliseconds::zero()));
     if (error && error != std::errc::timed_out) return error;
     if (left <= milliseconds::zero()) return {};

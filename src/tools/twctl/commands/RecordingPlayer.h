@@ -12,18 +12,18 @@
 
 namespace tonewerk {
 
-// Plays a recording on one connection, which takes what the answers are.
+// Plays a recording on one connection and waits for the answers.
 class RecordingPlayer {
  public:
-  // Told of each request that was refused: its line in the recording and why.
+  // Called for each request that was refused, with the call and the reason.
   using Refusal = std::function<void(const RecordedCall& call, const std::string& why)>;
 
-  // `speed` is above 0; 1 is as recorded, infinity without pauses. `daemon` is connected and outlives the
+  // `speed` is above 0; 1 plays as recorded, infinity without pauses. `daemon` is connected and outlives the
   // player.
   RecordingPlayer(DaemonConnection& daemon, double speed, Refusal refusal);
 
-  // Waits until every request is sent and answered, or the daemon is gone: no error after a request that ends
-  // it. A start's answer is not waited for: it only comes with the session's stop.
+  // Waits until every request is sent and answered, or the connection ends, which is no error after a request
+  // that ends the daemon. Does not wait for a start's answer, because it only comes when the session stops.
   [[nodiscard]] std::error_code play(const Recording& recording);
 
   std::size_t refused() const { return refused_; }

@@ -39,7 +39,7 @@ std::optional<Recording> readRecording(Tool& tool, const std::string& file) {
   std::ifstream text(file);
   std::optional<Recording> recording;
   if (text) recording = Recording::read(text, requests::all(), tool.json, problem);
-  // A directory opens, and fails to be read.
+  // A directory can be opened, but reading it fails.
   if (!text.is_open() || text.bad()) {
     const int reason = errno != 0 ? errno : EIO;
     tool.status = tool.fail(kWrongUsage, file + ": " + std::generic_category().message(reason));

@@ -19,7 +19,7 @@ bool printSessions(Tool& tool, StoreReader& reader, const EventFilter& filter) {
               tool.asJson ? Columns{"id", "started_at", "session_info", "user_info"}
                           : Columns{"id", "started", "session_info", "user_info"});
   return reader.readRtcSessions(filter, [&](const StoredRtcSession& session) {
-    // Both maps are JSON as they are.
+    // Both maps are JSON already.
     table.add({Value(session.id),
                Table::Cell::time(session.startedAt),
                {session.sessionInfo, session.sessionInfo},
@@ -27,7 +27,7 @@ bool printSessions(Tool& tool, StoreReader& reader, const EventFilter& filter) {
   });
 }
 
-// `head` comes before the first message.
+// Prints `head` before the first message.
 bool printMessages(Tool& tool, StoreReader& reader, const EventFilter& filter, const std::string& head) {
   Table table(tool.out, tool.asJson,
               tool.asJson ? Columns{"id", "sent_at", "rtc_session", "category", "type", "payload"}

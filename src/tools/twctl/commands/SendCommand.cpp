@@ -46,7 +46,8 @@ std::optional<ValueMap> payloadOf(const Tool& tool, const SendOptions& options, 
   return map;
 }
 
-// Whether all of them are sessions; says which are none. The daemon itself passes over those in silence.
+// False when an identifier names no session; the problem is then printed. The daemon itself ignores such
+// identifiers.
 bool knowsAll(Tool& tool, DaemonCalls& daemon, const std::vector<ReporterID>& reporterIDs) {
   std::string unknown;
   for (const ReporterID reporterID : reporterIDs) {

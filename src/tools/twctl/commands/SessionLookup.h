@@ -9,9 +9,9 @@ namespace tonewerk {
 
 class DaemonCalls;
 
-// Asks the daemon for the session of that identifier: its service type in `serviceType`, or none when nobody
-// has it. 0, by which the answer says "nobody", is always found. False when the daemon did not answer, which
-// has then been said.
+// Asks the daemon for the session with this identifier, and sets `serviceType` to its service type, or to
+// none when there is no such session. The identifier 0 always seems to exist, because the answer uses it for
+// "no session". False when the daemon did not answer; the problem is then printed.
 [[nodiscard]] bool lookUpSession(DaemonCalls& daemon, ReporterID reporterID,
                                  std::optional<AudioServiceType>& serviceType);
 

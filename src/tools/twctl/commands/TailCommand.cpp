@@ -31,7 +31,7 @@ Argument listOf(const std::vector<ReporterID>& numbers) {
   return ValueArray(std::vector<Value>(numbers.begin(), numbers.end()));
 }
 
-// The parameters of watch.openMessages; what is wrong with the options in `problem`.
+// The parameters of watch.openMessages. None when an option is wrong, with the reason in `problem`.
 std::optional<Arguments> filterOf(const TailOptions& options, std::string& problem) {
   Arguments filter{listOf(options.reporterIDs), std::nullopt, std::nullopt};
   if (options.category) {
@@ -49,7 +49,7 @@ std::optional<Arguments> filterOf(const TailOptions& options, std::string& probl
   return filter;
 }
 
-// Prints an answer of watch.nextMessages, at most `left` messages of it, which it counts down.
+// Prints at most `left` messages of an answer of watch.nextMessages, and subtracts their number from `left`.
 void print(const Tool& tool, const ValueMap& answer, std::int64_t& left) {
   const MessagePrinter printer(tool);
   const std::int64_t missed = answer.integer(kWatchKeyMissed);

@@ -27,7 +27,7 @@ double steadyNow() {
   return std::chrono::duration<double>(std::chrono::steady_clock::now().time_since_epoch()).count();
 }
 
-// The terminal of a tool.
+// Shows pages on the tool's terminal.
 class TerminalScreen final : public LiveScreen {
  public:
   explicit TerminalScreen(const Tool& tool)
@@ -50,7 +50,7 @@ class TerminalScreen final : public LiveScreen {
     }
   }
 
-  // False when somebody has seen enough before it is readable.
+  // False when the user quits before the descriptor is readable.
   bool waitReadable(int descriptor) {
     for (;;) {
       const LiveEvents::Event event = events_.wait(descriptor, std::nullopt);
@@ -68,10 +68,10 @@ class TerminalScreen final : public LiveScreen {
 
   std::ostream& out_;
   LiveEvents events_;
-  Terminal terminal_;  // restored before signals do again what they did
+  Terminal terminal_;  // destroyed, and so restored, before the signal handlers are
 };
 
-// All sessions, portion by portion; none when `ask` gave none.
+// Reads all sessions in portions. None when `ask` returned none.
 template <typename Ask>
 std::optional<std::vector<ValueMap>> listSessions(Ask ask) {
   std::vector<ValueMap> sessions;
@@ -98,7 +98,7 @@ void printFrame(const Tool& tool, const std::vector<SessionRow>& rows) {
   tool.out.flush();
 }
 
-// A rate needs two listings.
+// Reads two listings, because a rate needs two.
 void printOneFrame(const Tool& tool, DaemonCalls& daemon, double interval) {
   const auto ask = [&daemon](const Arguments& arguments) -> std::optional<Value> {
     std::optional<Value> result;

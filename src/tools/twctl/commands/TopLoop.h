@@ -11,7 +11,7 @@
 
 namespace tonewerk {
 
-// Where pages are shown that change until somebody has seen enough.
+// Shows pages that change until the user quits.
 class LiveScreen {
  public:
   enum class Event { kTime, kResized, kQuit };
@@ -21,16 +21,17 @@ class LiveScreen {
   virtual TerminalSize size() const = 0;
   virtual void show(const std::vector<std::string>& lines) = 0;
 
-  // Seconds of a time that never goes back.
+  // In seconds of a monotonic clock.
   virtual double now() const = 0;
-  // Waits until then, or until something happens before.
+  // Waits until `time`, or until another event.
   [[nodiscard]] virtual Event waitUntil(double time) = 0;
 };
 
-// Lists the sessions there are; none when that failed, or somebody has seen enough meanwhile.
+// Lists the daemon's sessions. None on failure, or when the user quits meanwhile.
 using SessionSource = std::function<std::optional<std::vector<ValueMap>>()>;
 
-// Shows what sessions do, anew every `interval` seconds, until the screen or the source says to stop.
+// Shows the sessions, and updates them every `interval` seconds, until the screen quits or the source returns
+// none.
 void runTop(const SessionSource& source, LiveScreen& screen, double interval);
 
 }  // namespace tonewerk

@@ -11,7 +11,7 @@
 namespace tonewerk {
 namespace {
 
-// The time that an option says; none without the option. False when it says none.
+// Reads the time of an option; none without the option. False when it is not a time.
 bool readTime(Tool& tool, const char* option, const std::optional<std::string>& text,
               std::optional<double>& time) {
   if (!text) return true;

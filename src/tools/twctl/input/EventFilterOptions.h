@@ -15,15 +15,15 @@ namespace tonewerk {
 
 struct Tool;
 
-// The options by which commands choose among stored events: --name, --since, --until and --limit.
+// Declares and reads the options that choose among stored events: --name, --since, --until and --limit.
 class EventFilterOptions {
  public:
-  // Declares them for `command`, whose footer says how times are written. The object outlives it. What has no
-  // name gets no --name.
+  // Declare the options for `command`, and explain in its footer how times are written. This object outlives
+  // `command`. Entries that have no name get no --name.
   void addTo(CLI::App& command);
   void addWithoutNameTo(CLI::App& command);
 
-  // What they say. None when one is wrong; `tool` has then said so.
+  // The filter. None when an option is wrong; the problem is then printed.
   [[nodiscard]] std::optional<EventFilter> filter(Tool& tool) const;
 
  private:

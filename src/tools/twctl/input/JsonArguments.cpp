@@ -11,8 +11,8 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
-// Values are JSON without null, so arguments are taken apart here and their values read by the service, whose
-// rules are the daemon's.
+// Values cannot be null, so the array of arguments is read here. The service reads the values themselves, by
+// the same rules as the daemon.
 std::optional<Value> valueOf(const Json& json, const JsonService& service, std::string& problem) {
   return service.parse(json.dump(), problem);
 }

@@ -15,7 +15,7 @@ bool is(const Preference& preference, std::string_view domain, std::string_view 
   return preference.domain == domain && preference.key == key;
 }
 
-// What is wrong inside of a list whose entries have a form of their own, as the daemon finds it.
+// The problems that the daemon finds inside lists whose entries have a format of their own.
 std::vector<std::string> problemsInside(const Preference& preference, const Value& value) {
   if (is(preference, LinuxLinkReport::kPreferenceDomain, LinuxLinkReport::kBackendsKey))
     return LinkReportBackends::from(value).problems;

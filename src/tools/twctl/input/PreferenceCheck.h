@@ -10,8 +10,8 @@
 
 namespace tonewerk {
 
-// What the daemon would leave out of a preference that it knows, and why; empty for one that it does not
-// know.
+// The problems because of which the daemon would ignore a preference or a part of it. Empty for a preference
+// that it does not know.
 [[nodiscard]] std::vector<std::string> preferenceProblems(std::string_view domain, std::string_view key,
                                                           const Value& value);
 

@@ -40,7 +40,7 @@ Value valueAt(const Value& value, double now) {
   return resolved;
 }
 
-// What is wrong with the line's members besides "params", or an empty text.
+// Reads the line's members besides "params". Returns the problem, or an empty text.
 std::string takeMembers(const ValueMap& members, RecordedCall& call) {
   for (const ValueMap::Entry& entry : members) {
     if (entry.key != kAt && entry.key != kCall) return "unknown member \"" + entry.key.string() + "\"";
@@ -57,7 +57,7 @@ std::string takeMembers(const ValueMap& members, RecordedCall& call) {
 std::string checkRequest(const RecordedCall& call, const RequestSet& interface) {
   const auto method = interface.find(call.method);
   if (!method) return "there is no request \"" + call.method + "\"";
-  // With any time: what a time stands for is a number whenever it is played.
+  // The time does not matter here: {"now": offset} always becomes a number.
   return problemWith(interface.methods[*method], call.parametersAt(0.0)).value_or("");
 }
 

@@ -12,8 +12,8 @@ namespace {
 
 char lower(char c) { return static_cast<char>(std::tolower(static_cast<unsigned char>(c))); }
 
-// How many letters must be added, taken out, replaced or exchanged with their neighbour to get from one to
-// the other.
+// How many letters must be added, removed, replaced or swapped with their neighbour to turn one text into the
+// other.
 std::size_t changesBetween(std::string_view from, std::string_view to) {
   std::vector<std::size_t> beforeLast;
   std::vector<std::size_t> last(to.size() + 1);
@@ -35,10 +35,10 @@ std::size_t changesBetween(std::string_view from, std::string_view to) {
 }  // namespace
 
 std::optional<std::string> closestTo(std::string_view word, const std::vector<std::string>& names) {
-  // A third of the letters may be wrong, and one of a short word.
-  const std::size_t most = std::max<std::size_t>(1, (word.size() + 1) / 3);
+  // A third of the letters may be wrong, and at least one.
+  const std::size_t maxChanges = std::max<std::size_t>(1, (word.size() + 1) / 3);
   std::optional<std::string> closest;
-  std::size_t fewest = most + 1;
+  std::size_t fewest = maxChanges + 1;
   for (const std::string& name : names) {
     const std::size_t changes = changesBetween(word, name);
     if (changes >= fewest || changes >= name.size()) continue;

@@ -8,10 +8,10 @@
 
 namespace tonewerk {
 
-// Helps who has typed a word that names nothing.
+// Suggestions for a person who has typed an unknown name.
 
-// The name that it takes the fewest changes to get to from `word`; none when it takes too many for a slip.
-// Upper and lower case are the same.
+// The name that differs from `word` by the fewest changes; none when these are too many for a typing error.
+// Ignores case.
 [[nodiscard]] std::optional<std::string> closestTo(std::string_view word,
                                                    const std::vector<std::string>& names);
 

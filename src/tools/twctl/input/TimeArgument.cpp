@@ -10,12 +10,12 @@
 namespace tonewerk {
 namespace {
 
-// Takes a text apart from the front. Once something does not fit, nothing does.
+// Reads a text from its beginning. After one failure everything fails.
 class Scanner {
  public:
   explicit Scanner(std::string_view text) : rest_(text) {}
 
-  // Exactly `digits` digits.
+  // Reads exactly `digits` digits.
   int number(std::size_t digits) {
     int value = 0;
     if (rest_.size() < digits) return fail();
@@ -26,7 +26,7 @@ class Scanner {
     rest_.remove_prefix(digits);
     return value;
   }
-  // One character of these; 0 when it is none.
+  // Reads one of these characters; 0 when there is none.
   char anyOf(std::string_view characters) {
     if (rest_.empty() || characters.find(rest_.front()) == std::string_view::npos)
       return static_cast<char>(fail());
@@ -34,7 +34,7 @@ class Scanner {
     rest_.remove_prefix(1);
     return found;
   }
-  // ".5", or nothing.
+  // Reads a fraction such as ".5", or nothing.
   double fraction() {
     if (rest_.empty() || rest_.front() != '.') return 0.0;
     rest_.remove_prefix(1);

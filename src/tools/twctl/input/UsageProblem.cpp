@@ -9,7 +9,7 @@
 namespace tonewerk {
 namespace {
 
-// The commands that the words have named, outermost first: the tool itself, "defaults", "write".
+// The commands on the command line, outermost first, such as the tool itself, "defaults", "write".
 std::vector<const CLI::App*> commandsIn(const CLI::App& app) {
   std::vector<const CLI::App*> commands{&app};
   while (!commands.back()->get_subcommands().empty())
@@ -31,8 +31,7 @@ std::vector<std::string> commandsOf(const CLI::App& command) {
   return names;
 }
 
-// "unknown command 'evnts'; did you mean 'events'?", and nothing instead of the question when nothing is
-// close.
+// "unknown command 'evnts'; did you mean 'events'?", without the question when no name is close.
 std::string unknown(const std::string& what, const std::string& word, const std::vector<std::string>& names) {
   const auto meant = closestTo(word, names);
   return "unknown " + what + " '" + word + "'" + (meant ? "; " + didYouMean(*meant) : "");
@@ -45,12 +44,12 @@ std::string problemWithWord(const CLI::App& command, const std::string& word) {
   return commands.empty() ? "unexpected argument '" + word + "'" : unknown("command", word, commands);
 }
 
-// "--limit: 1 required INT missing" is how the parser says it.
+// The parser's text is like "--limit: 1 required INT missing".
 std::string mismatchOf(const std::string& text) {
   return text.ends_with(" missing") ? text.substr(0, text.find(": ")) + " needs a value" : text;
 }
 
-// "twctl defaults"
+// The words that name the command, such as "twctl defaults".
 std::string callOf(const std::vector<const CLI::App*>& commands) {
   std::string call;
   for (const CLI::App* command : commands) call += (call.empty() ? "" : " ") + command->get_name();

@@ -10,7 +10,7 @@ class ParseError;
 
 namespace tonewerk {
 
-// What is wrong with the command line that `app` did not take, in one line.
+// Describes in one line why `app` has refused the command line.
 [[nodiscard]] std::string usageProblem(const CLI::App& app, const CLI::ParseError& error);
 
 }  // namespace tonewerk

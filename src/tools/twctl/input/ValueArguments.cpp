@@ -28,7 +28,7 @@ std::optional<Number> numberOf(std::string_view text) {
   return number;
 }
 
-// Names of numbers, from the lowest on.
+// A number and its name.
 template <typename Number>
 struct Named {
   std::string name;
@@ -48,7 +48,7 @@ const std::vector<Named<AudioEventCategory>>& baseCategories() {
   return categories;
 }
 
-// A domain is one bit of the upper half, and shows before the base's name.
+// A domain is one bit of the upper half. Its name precedes the base's name.
 const std::vector<Named<AudioEventCategory>>& categoriesOfDomains() {
   static const auto categories = [] {
     std::vector<Named<AudioEventCategory>> named;
@@ -67,7 +67,7 @@ const std::vector<Named<AudioEventCategory>>& categoriesOfDomains() {
 const std::vector<Named<AudioEventType>>& types() {
   static const auto all = [] {
     std::vector<Named<AudioEventType>> named;
-    // What has no name of its own has that of the first.
+    // Numbers without a name of their own have the name of the first.
     for (AudioEventType type = 0; type < kNamesEnd; ++type) {
       std::string name = TWReportingUtilityTypeString(type);
       if (named.empty() || name != named.front().name) named.push_back({std::move(name), type});
@@ -100,7 +100,7 @@ Value valueOfArgument(std::string_view text) {
   if (text == "false") return false;
   if (const auto integer = numberOf<std::int64_t>(text)) return *integer;
   if (const auto integer = numberOf<std::uint64_t>(text)) return *integer;
-  // "inf" and "nan" are read as numbers too, but nobody who types them means that.
+  // "inf" and "nan" would be read as numbers, but people who type them mean texts.
   if (const auto number = numberOf<double>(text); number && std::isfinite(*number)) return *number;
   return text;
 }
@@ -126,7 +126,7 @@ std::optional<AudioEventType> typeOfArgument(std::string_view text) {
 
 std::string unknownCategory(std::string_view text) {
   std::vector<std::string> names = namesOf(baseCategories());
-  const std::string listed = thereAre(names);  // those of domains are too many to list
+  const std::string listed = thereAre(names);  // too many of them have a domain to list them all
   for (std::string& name : namesOf(categoriesOfDomains())) names.push_back(std::move(name));
   const std::optional<std::string> meant = closestTo(text, names);
   return "there is no category '" + std::string(text) + "'; " + (meant ? didYouMean(*meant) : listed);

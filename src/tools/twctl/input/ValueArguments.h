@@ -10,30 +10,30 @@
 
 namespace tonewerk {
 
-// What people type on the command line as values.
+// Reads values that people type on the command line.
 
-// `true`, `false`, a number, or else the text itself.
+// A boolean for "true" or "false", a number, otherwise the text itself.
 Value valueOfArgument(std::string_view text);
 
-// "KEY=VALUE"; none without a key or an "=".
+// Reads "KEY=VALUE"; none without a key or without "=".
 [[nodiscard]] std::optional<ValueMapEntry> entryOfArgument(std::string_view text);
 
-// "Playback", "HAL_Playback", "Unknown" or a number; none for anything else.
+// Reads "Playback", "HAL_Playback", "Unknown" or a number; none for any other text.
 [[nodiscard]] std::optional<AudioEventCategory> categoryOfArgument(std::string_view text);
 
-// "Start", "Unknown" or a number; none for anything else.
+// Reads "Start", "Unknown" or a number; none for any other text.
 [[nodiscard]] std::optional<AudioEventType> typeOfArgument(std::string_view text);
 
-// That there is no such category or type, and what there is instead.
+// Say that there is no such category or type, and which ones there are.
 std::string unknownCategory(std::string_view text);
 std::string unknownType(std::string_view text);
 
-// What is wrong with a session's identifier; empty when it is a decimal number of 64 bits with a sign. For
-// options that are read into a ReporterID: their own reading takes a number that is too large for the largest
-// there is.
+// The problem with a session's identifier; empty when it is a decimal number of 64 bits with a sign. For
+// options that are read into a ReporterID, because the parser itself would turn a number that is too large
+// into the largest one.
 [[nodiscard]] std::string problemWithReporterID(const std::string& text);
 
-// The same of how many there may be, from 1, and of an interval in seconds, from 0.05 to 86400.
+// The same for a count, from 1, and for an interval in seconds, from 0.05 to 86400.
 [[nodiscard]] std::string problemWithCount(const std::string& text);
 [[nodiscard]] std::string problemWithSeconds(const std::string& text);
 

@@ -13,7 +13,7 @@
 namespace tonewerk {
 namespace {
 
-// Back to the top left corner, and everything gone.
+// Moves the cursor to the top left corner and clears the screen.
 constexpr char kClearTerminal[] = "\x1b[H\x1b[2J";
 
 bool fitsPattern(const std::optional<std::string>& pattern, const std::optional<std::string_view>& text) {

@@ -10,7 +10,7 @@ namespace tonewerk {
 
 struct Tool;
 
-// Which channels to show: those whose driver and group fit these patterns (*, ?, [...]); none for all.
+// Chooses the channels to show by patterns for driver and group (*, ?, [...]). Without a pattern, all match.
 struct ChannelFilter {
   std::optional<std::string> driver;
   std::optional<std::string> group;
@@ -18,22 +18,22 @@ struct ChannelFilter {
   bool fits(const ChanmeterSample& sample) const;
 };
 
-// Prints the channels there are, or what changed since it was asked last. Each time it looks for new ones.
+// Prints all channels, or the changes since the last call. Each call also finds new channels.
 class ChannelPrinter {
  public:
-  // All are borrowed.
+  // All arguments must outlive this object.
   ChannelPrinter(Tool& tool, Chanmeter& chanmeter, const ChannelFilter& filter)
       : tool_(tool), chanmeter_(chanmeter), filter_(filter) {}
 
-  // False when some source could not be read; the others are printed.
+  // False when a source could not be read; the others are printed.
   [[nodiscard]] bool printValues();
 
-  // A block of its own: the time, and below it the channels in which something happened since the last call.
-  // The first call prints nothing. `at`: seconds since 1970.
+  // Prints a block with the time and the channels that have changed since the last call. The first call
+  // prints nothing. `at` is in seconds since 1970.
   void printChanges(double at);
 
  private:
-  // Null when nothing could be read.
+  // Null when no source could be read.
   [[nodiscard]] Chanmeter::Samples takeSamples(std::optional<ChanmeterError>& error);
   // Returns how many were printed.
   std::size_t print(const ChanmeterSamples& samples, std::optional<double> changedAt);

@@ -11,7 +11,7 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
-// Null when a key of the path is not there.
+// Null when a key of the path is missing.
 const Json* find(const Json& root, std::initializer_list<const char*> path) {
   const Json* at = &root;
   for (const char* key : path) {
@@ -23,7 +23,7 @@ const Json* find(const Json& root, std::initializer_list<const char*> path) {
   return at;
 }
 
-// Texts as they are, anything else as JSON; bytes that are no UTF-8 are replaced.
+// Texts as they are, other values as JSON. Bytes that are not UTF-8 are replaced.
 std::string textOf(const Json* value) {
   if (value == nullptr || value->is_null()) return "";
   if (value->is_string()) return printable(value->get<std::string>());
@@ -34,7 +34,7 @@ std::string textAt(const Json& root, std::initializer_list<const char*> path) {
   return textOf(find(root, path));
 }
 
-// The texts that are there, separated.
+// Joins the texts that are not empty.
 std::string joined(std::initializer_list<std::string> texts, const char* separator) {
   std::string all;
   for (const std::string& text : texts) {

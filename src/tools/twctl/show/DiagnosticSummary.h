@@ -11,23 +11,23 @@
 
 namespace tonewerk {
 
-// What a request.json says, in words for people. Much of it comes from clients: nothing in it moves a
-// terminal's cursor. What is not there is empty.
+// Holds the content of a request.json as texts for people. Much of it comes from clients, so control
+// characters are replaced. Missing fields are empty.
 struct DiagnosticSummary {
   std::string when;  // RFC 3339
   std::string what;
   std::string why;
   std::string process;
-  std::string component;                                      // a draft's
-  std::string duration;                                       // a capture's, in seconds
+  std::string component;                                      // for a draft
+  std::string duration;                                       // for a capture, in seconds
   std::string payload;                                        // compact JSON
   std::vector<std::pair<std::string, std::string>> problems;  // by file
 
-  // None when `text` is no JSON object.
+  // None when `text` is not a JSON object.
   [[nodiscard]] static std::optional<DiagnosticSummary> read(DiagnosticKind kind, std::string_view text);
 };
 
-// One line of JSON; "null" when `text` is no JSON.
+// `text` as one line of JSON; "null" when it is not JSON.
 std::string compactJson(std::string_view text);
 
 }  // namespace tonewerk

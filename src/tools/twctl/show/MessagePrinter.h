@@ -9,13 +9,13 @@ namespace tonewerk {
 
 struct Tool;
 
-// Prints watched messages, one a line: for people, or for programs as one JSON object.
+// Prints watched messages, one per line: as text for people, or as a JSON object for programs.
 class MessagePrinter {
  public:
   // `tool` outlives it.
   explicit MessagePrinter(const Tool& tool) : tool_(tool) {}
 
-  // As the daemon has described it.
+  // `message` is a description that the daemon has sent.
   void print(const ValueMap& message) const;
   void printMissed(std::uint64_t count) const;
 

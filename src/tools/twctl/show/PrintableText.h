@@ -5,8 +5,8 @@
 
 namespace tonewerk {
 
-// What clients and publishers chose, for a terminal: with a '?' for each control character, those that UTF-8
-// writes in two bytes included.
+// Makes text from clients and publishers safe for a terminal: replaces each control character by '?', also
+// those that take two bytes in UTF-8.
 std::string printable(std::string text);
 
 }  // namespace tonewerk

@@ -34,8 +34,8 @@ std::vector<SessionRow> SessionRates::rowsOf(const std::vector<ValueMap>& listin
 std::optional<double> SessionRates::rateOf(const Key& key, std::uint64_t count, double now) const {
   if (!earlierAt_ || !(now > *earlierAt_)) return std::nullopt;
   const auto earlier = earlier_.find(key);
-  const bool goesOn = earlier != earlier_.end() && earlier->second <= count;
-  const std::uint64_t arrived = goesOn ? count - earlier->second : count;
+  const bool isSameRun = earlier != earlier_.end() && earlier->second <= count;
+  const std::uint64_t arrived = isSameRun ? count - earlier->second : count;
   return static_cast<double>(arrived) / (now - *earlierAt_);
 }
 

@@ -12,23 +12,23 @@
 
 namespace tonewerk {
 
-// A session as the daemon has described it, and what it receives.
+// A session as the daemon has described it, with its rate of messages.
 struct SessionRow {
   ValueMap session;
-  std::optional<double> messagesPerSecond;  // none as long as there is nothing to compare with
-  std::optional<double> redundantShare;     // of all it has received, 0 to 1; none when that is nothing
+  std::optional<double> messagesPerSecond;  // none without an earlier listing
+  std::optional<double> redundantShare;     // of all its messages, 0 to 1; none without messages
 };
 
-// Makes rates of what the daemon says time and again.
+// Computes rates from successive listings of the daemon's sessions.
 class SessionRates {
  public:
-  // `listing` was taken at `now`, in seconds of a time that never goes back. The busiest first, then by
-  // identifier. A session that is new since the listing before, or was stopped in between, received all its
-  // messages since then.
+  // `listing` was taken at `now`, in seconds of a monotonic clock. Returns the busiest session first, then by
+  // identifier. A session that is new since the previous listing, or was stopped in between, has received all
+  // its messages since then.
   std::vector<SessionRow> rowsOf(const std::vector<ValueMap>& listing, double now);
 
  private:
-  // Process, session, and which of several of those: a process may have two connections.
+  // Process, session, and a number: a process may have the same session on two connections.
   using Key = std::tuple<std::int64_t, std::int64_t, std::size_t>;
   using Counts = std::map<Key, std::uint64_t>;
 

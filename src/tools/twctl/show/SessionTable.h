@@ -7,7 +7,7 @@
 
 namespace tonewerk {
 
-// Sessions as `twctl list` and `twctl validate` show them.
+// Prints sessions for `twctl list` and `twctl validate`.
 class SessionTable {
  public:
   explicit SessionTable(const Tool& tool);

@@ -10,34 +10,34 @@
 
 namespace tonewerk {
 
-// Rows for people, in columns, or for programs, as one JSON object a line.
+// Prints rows: in columns for people, or as one JSON object per line for programs.
 class Table {
  public:
-  // `columns` are the heads of the columns and the keys of the objects.
+  // `columns` are the headings of the columns and the keys of the objects.
   Table(std::ostream& out, bool asJson, std::vector<std::string> columns);
   Table(const Table&) = delete;
   Table& operator=(const Table&) = delete;
-  // Prints what is left.
+  // Prints the rows that are not printed yet.
   ~Table();
 
   struct Cell {
     std::string text;  // for people
     std::string json;  // for programs, a JSON value
     Cell(const Value& value);
-    // Seconds since 1970: RFC 3339 for people, the number for programs.
+    // Makes a cell of seconds since 1970: RFC 3339 for people, the number for programs.
     static Cell time(double seconds);
     Cell(std::string shown, std::string written) : text(std::move(shown)), json(std::move(written)) {}
   };
-  // As many cells as columns.
+  // `cells` must have as many elements as there are columns.
   void add(std::vector<Cell> cells);
 
-  // Prints the rows added so far. Columns that a row makes wider stay so.
+  // Prints the rows added so far. A column that was made wider by a row stays wide.
   void print();
 
  private:
   void printRow(const std::vector<std::string>& texts);
 
-  // Rows are printed in portions, so that a long table needs no more memory than these.
+  // Rows are printed in portions of this size, so that a long table needs little memory.
   static constexpr std::size_t kPortion = 500;
 
   std::ostream& out_;

@@ -8,7 +8,7 @@
 namespace tonewerk {
 namespace {
 
-constexpr char kEnter[] = "\x1b[?1049h\x1b[?25l";  // the other screen, no cursor
+constexpr char kEnter[] = "\x1b[?1049h\x1b[?25l";  // the alternate screen, without a cursor
 constexpr char kLeave[] = "\x1b[?25h\x1b[?1049l";
 constexpr char kHome[] = "\x1b[H";
 constexpr char kClearRestOfLine[] = "\x1b[K";
@@ -49,8 +49,8 @@ TerminalSize Terminal::size() const {
   return {size.ws_col, size.ws_row};
 }
 
-// Written over the page before, so that nothing flickers. No line end after the last line: it would push the
-// first one out where the page fills the screen.
+// Writes over the previous page, so that the screen does not flicker. There is no line end after the last
+// line: if the page fills the screen, it would scroll the first line away.
 void Terminal::show(const std::vector<std::string>& lines) {
   out_ << kHome;
   for (std::size_t at = 0; at < lines.size(); ++at) {

@@ -14,19 +14,19 @@ struct TerminalSize {
   std::size_t rows = 24;
 };
 
-// A terminal that shows one page at a time, on the screen that it keeps for such programs; what was there
-// before is there again afterwards. Keys come as they are pressed, Ctrl-C included, and are not shown.
+// Shows one page at a time on the terminal's alternate screen. The destructor restores the previous screen.
+// Keys arrive as they are pressed, also Ctrl-C, and are not echoed.
 class Terminal {
  public:
-  // `out` writes to the terminal `outDescriptor`; keys come from `inDescriptor`, if that is one too.
+  // `out` writes to the terminal `outDescriptor`. `inDescriptor` delivers keys, if it is a terminal, too.
   Terminal(std::ostream& out, int inDescriptor, int outDescriptor);
   Terminal(const Terminal&) = delete;
   Terminal& operator=(const Terminal&) = delete;
-  // Everything is as it was.
+  // Restores the screen and the input's modes.
   ~Terminal();
 
   TerminalSize size() const;
-  // In place of what is there.
+  // Replaces the page by these lines.
   void show(const std::vector<std::string>& lines);
 
  private:
@@ -35,7 +35,7 @@ class Terminal {
   std::ostream& out_;
   const int inDescriptor_;
   const int outDescriptor_;
-  const std::unique_ptr<InputModes> before_;  // null when the input is no terminal
+  const std::unique_ptr<InputModes> before_;  // null when the input is not a terminal
 };
 
 }  // namespace tonewerk

@@ -12,15 +12,15 @@
 
 namespace tonewerk {
 
-// The sessions as a page for people. On a screen of `size` it is cut to that, and its last line then says how
-// many more there are; without a size it is as long and wide as it wants.
+// Formats the sessions as a page for people. The page is cut to `size`, and its last line then says how many
+// more sessions there are. Without a size nothing is cut.
 std::vector<std::string> topFrame(const std::vector<SessionRow>& rows,
                                   const std::optional<TerminalSize>& size);
 
-// A session for programs.
+// Formats a session for programs.
 ValueMap topObject(const SessionRow& row);
 
-// "7 s", "3:07", "2:03:07" or "5 d 2:03:07".
+// Formats a duration as "7 s", "3:07", "2:03:07" or "5 d 2:03:07".
 std::string runningTime(double seconds);
 
 }  // namespace tonewerk
