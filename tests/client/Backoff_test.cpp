@@ -24,7 +24,7 @@ TEST(BackoffTest, WaitsTwiceAsLongAfterEachAttemptUpToItsBound) {
   }
 }
 
-TEST(BackoffTest, SpreadsThoseWhoLostOneDaemon) {
+TEST(BackoffTest, SpreadsClientsThatLostTheSameDaemon) {
   Backoff one(milliseconds(250), milliseconds(30'000), 1);
   Backoff other(milliseconds(250), milliseconds(30'000), 2);
   bool differs = false;
@@ -32,7 +32,7 @@ TEST(BackoffTest, SpreadsThoseWhoLostOneDaemon) {
   EXPECT_TRUE(differs);
 }
 
-TEST(BackoffTest, BeginsAnewAfterAGoodConnection) {
+TEST(BackoffTest, StartsAgainAfterAGoodConnection) {
   Backoff backoff(milliseconds(250), milliseconds(30'000), 1);
   for (int at = 0; at < 8; ++at) backoff.next();
   backoff.reset();

@@ -25,7 +25,7 @@ using testing::IsEmpty;
 
 using ClientEngineTest = ClientTest;
 
-// Where the kernel tells of the client's thread; empty without one.
+// The directory in /proc of the client's thread; empty without one.
 std::string clientThread() {
   for (const auto& entry : std::filesystem::directory_iterator("/proc/self/task")) {
     std::string name;
@@ -65,7 +65,7 @@ TEST_F(ClientEngineTest, HasAThreadOfItsOwnAsLongAsItLives) {
 TEST_F(ClientEngineTest, LeavesSignalsToTheProgram) {
   connectWithSession();
   const std::string blocked = statusOfClientThread("SigBlk:");
-  // All but those that cannot be blocked and two of the C library's own.
+  // All signals except those that cannot be blocked and two that the C library uses.
   const std::uint64_t mask = std::stoull(blocked, nullptr, 16);
   for (const int signal : {SIGTERM, SIGINT, SIGCHLD, SIGUSR1, SIGALRM, SIGPIPE})
     EXPECT_NE(mask >> static_cast<unsigned>(signal - 1) & 1U, 0U) << signal;
@@ -102,7 +102,7 @@ TEST_F(ClientEngineTest, SaysThatThereIsNoDaemon) {
   EXPECT_EQ(twr_client_connect(client, kScriptPatienceMs), TWR_NOT_CONNECTED);
   EXPECT_EQ(info().state, TWR_STATE_WAITING);
   EXPECT_EQ(info().last_error, ECONNREFUSED);
-  // Each question is an attempt of its own.
+  // Each call makes an attempt of its own.
   session = twr_session_create(client, 77);
   EXPECT_EQ(twr_client_flush(client, kScriptPatienceMs), TWR_NOT_CONNECTED);
   daemon = std::make_unique<ScriptedServer>(path);
@@ -157,7 +157,7 @@ TEST_F(ClientEngineTest, MakesItsSessionsAgainWhenTheDaemonComesBack) {
   EXPECT_EQ(info().last_error, ECONNRESET);
 }
 
-TEST_F(ClientEngineTest, TellsThoseWhoWaitWhenTheConnectionBreaks) {
+TEST_F(ClientEngineTest, CallsWaitingRepliesWhenTheConnectionBreaks) {
   auto connection = connectWithSession();
   ASSERT_EQ(send(1, AnswerLog::note, log.as("send")), TWR_OK);
   connection->next();
@@ -169,7 +169,7 @@ TEST_F(ClientEngineTest, TellsThoseWhoWaitWhenTheConnectionBreaks) {
   EXPECT_EQ(connection->nextText(), message(2));
 }
 
-TEST_F(ClientEngineTest, EndsAConnectionOnWhichItUnderstandsNothing) {
+TEST_F(ClientEngineTest, ClosesAConnectionOnInvalidData) {
   const std::vector<std::string> nonsense = {
       "\xFF\xFF\xFF",
       std::string("\x94\x00\x01\xA1m\x90", 6),
@@ -194,7 +194,7 @@ TEST_F(ClientEngineTest, EndsAConnectionOnWhichItUnderstandsNothing) {
   EXPECT_EQ(info().last_error, EBADMSG);
 }
 
-TEST_F(ClientEngineTest, GoesOnAfterAnAnswerToNothing) {
+TEST_F(ClientEngineTest, IgnoresAnAnswerToNoRequest) {
   const auto connection = connectWithSession();
   connection->answer(4711, true);
   EXPECT_EQ(send(1), TWR_OK);
@@ -208,7 +208,7 @@ TEST_F(ClientEngineTest, WaitsForADaemonThatReadsNothingAndLosesNothing) {
   makeClientWith(chosen);
   const auto connection = connectWithSession();
   int sent = 0;
-  // More than sockets hold.
+  // More than the sockets' buffers hold.
   for (; sent < 6000; ++sent) ASSERT_EQ(send(sent), TWR_OK);
   EXPECT_EQ(twr_client_flush(client, 1), TWR_TIMED_OUT);
   EXPECT_EQ(twr_client_connect(client, 0), TWR_OK);
@@ -224,7 +224,7 @@ TEST_F(ClientEngineTest, SendsAgainWhatADaemonThatReadNothingDidNotTake) {
   constexpr int kCount = 6000;
   for (int at = 0; at < kCount; ++at) ASSERT_EQ(send(at), TWR_OK);
   EXPECT_EQ(twr_client_flush(client, 1), TWR_TIMED_OUT);
-  // What lies in the socket is lost with the connection; from there on nothing is, and nothing comes twice.
+  // Messages in the socket's buffers are lost with the connection. All later ones arrive, each once.
   connection.reset();
   connection = daemon->accept();
   EXPECT_EQ(connection->nextText(), "createReportingSession 77");
@@ -249,7 +249,7 @@ TEST_F(ClientEngineTest, TriesAgainAfterEachFailure) {
   }
 }
 
-TEST_F(ClientEngineTest, TriesOnceWhereItIsToldTo) {
+TEST_F(ClientEngineTest, TriesOnceWithTheOptionOnce) {
   daemon.reset();
   ClientSettings chosen = settings(path);
   chosen.isOnce = true;
@@ -270,7 +270,7 @@ TEST_F(ClientEngineTest, TriesOnceWhereItIsToldTo) {
   EXPECT_FALSE(daemon->hasCaller());
 }
 
-TEST_F(ClientEngineTest, TellsThoseWhoWaitWhenTheOnlyAttemptFails) {
+TEST_F(ClientEngineTest, CallsWaitingRepliesWhenTheOnlyAttemptFails) {
   daemon.reset();
   ClientSettings chosen = settings(path);
   chosen.isOnce = true;
@@ -280,7 +280,7 @@ TEST_F(ClientEngineTest, TellsThoseWhoWaitWhenTheOnlyAttemptFails) {
   }
 }
 
-TEST_F(ClientEngineTest, ConnectsNoSecondTimeWhereItIsToldTo) {
+TEST_F(ClientEngineTest, DoesNotReconnectWithTheOptionOnce) {
   ClientSettings chosen = settings(path);
   chosen.isOnce = true;
   makeClientWith(chosen);
@@ -305,7 +305,7 @@ TEST_F(ClientEngineTest, SendsEverythingBeforeItIsDestroyed) {
   destroyer.join();
 }
 
-TEST_F(ClientEngineTest, HandsOutAnswersUntilTheDaemonHasClosedItsEnd) {
+TEST_F(ClientEngineTest, DeliversAnswersUntilTheDaemonHasClosedItsEnd) {
   auto connection = connectWithSession();
   twr_session_start(session, AnswerLog::note, log.as("stopped"));
   send(1, AnswerLog::note, log.as("send"));
@@ -320,8 +320,9 @@ TEST_F(ClientEngineTest, HandsOutAnswersUntilTheDaemonHasClosedItsEnd) {
               ElementsAre("send: done", "stopped: the client was destroyed before the answer came"));
 }
 
-// A daemon answers nothing to who has ended its half, so that is done last.
-TEST_F(ClientEngineTest, IsDestroyedWhenEverybodyWhoWaitsHasBeenAnswered) {
+// The daemon does not answer a client that has ended its half of the connection, so the client does that
+// last.
+TEST_F(ClientEngineTest, IsDestroyedWhenAllRequestsAreAnswered) {
   auto connection = connectWithSession();
   twr_session_start(session, AnswerLog::note, log.as("stopped"));
   twr_session_stop(session, AnswerLog::note, log.as("stop"));
@@ -335,7 +336,7 @@ TEST_F(ClientEngineTest, IsDestroyedWhenEverybodyWhoWaitsHasBeenAnswered) {
   EXPECT_EQ(log.next(), "stopped: done");
   EXPECT_EQ(log.next(), "stop: done");
   connection->answer(message, std::nullopt);
-  // It can still be said what the last answer leads to.
+  // The callback of the last answer can still send a message.
   EXPECT_EQ(connection->nextText(), ClientTest::message(2));
   EXPECT_TRUE(connection->waitForEnd());
   connection.reset();
@@ -354,7 +355,7 @@ TEST_F(ClientEngineTest, IsDestroyedWithoutAnswersThatADaemonMayHoldBack) {
   EXPECT_THAT(log.rest(), ElementsAre("watch: the client was destroyed before the answer came"));
 }
 
-TEST_F(ClientEngineTest, SaysThatTheConnectionBrokeWhereItDidBeforeTheAnswer) {
+TEST_F(ClientEngineTest, ReportsAConnectionThatBrokeBeforeTheAnswer) {
   auto connection = connectWithSession();
   send(1, AnswerLog::note, log.as("send"));
   connection->next();
@@ -397,8 +398,8 @@ TEST_F(ClientEngineTest, CarriesAMessageThatIsLargerThanItsQueue) {
   EXPECT_EQ(connection->nextMap().text("text"), text);
 }
 
-// Were the delay not reset, the last of these would come after minutes.
-TEST_F(ClientEngineTest, ComesBackSoonToADaemonThatAnswers) {
+// If the delay were not reset, the last of these connections would come after minutes.
+TEST_F(ClientEngineTest, ReconnectsSoonToADaemonThatAnswers) {
   ClientSettings chosen = settings(path);
   chosen.maxDelay = milliseconds(1'000'000);
   makeClientWith(chosen);
@@ -421,7 +422,7 @@ TEST_F(ClientEngineTest, LeavesNoDescriptorToProgramsThatAreExecuted) {
     EXPECT_NE(::fcntl(descriptor, F_GETFD) & FD_CLOEXEC, 0) << target;
     ++found;
   }
-  EXPECT_GE(found, 4);  // the daemon's two, the client's two
+  EXPECT_GE(found, 4);  // two of the daemon and two of the client
 }
 
 TEST_F(ClientEngineTest, ReadsTheEnvironmentOnceWhenItIsCreated) {
@@ -441,7 +442,7 @@ TEST_F(ClientEngineTest, RaisesNoSignalWhenTheDaemonIsGone) {
   EXPECT_NE(twr_client_flush(client, kScriptPatienceMs), TWR_TIMED_OUT);
 }
 
-TEST_F(ClientEngineTest, SendsWhatARealTimeThreadSays) {
+TEST_F(ClientEngineTest, SendsARealTimeThreadsMessages) {
   const auto connection = connectWithSession();
   twr_session_start(session, nullptr, nullptr);
   twr_sender* sender = twr_sender_open(session, 0);
@@ -462,7 +463,7 @@ TEST_F(ClientEngineTest, SendsWhatARealTimeThreadSays) {
   twr_sender_close(sender);
 }
 
-TEST_F(ClientEngineTest, TellsOfMessagesThatARingDropped) {
+TEST_F(ClientEngineTest, ReportsMessagesThatARingDropped) {
   const auto connection = connectWithSession();
   twr_sender* sender = twr_sender_open(session, 128);
   TestPayload payload;
@@ -476,7 +477,7 @@ TEST_F(ClientEngineTest, TellsOfMessagesThatARingDropped) {
 }
 
 TEST_F(ClientEngineTest, TheMessageAfterAFullRingSaysHowManyItDropped) {
-  daemon.reset();  // nobody empties the ring
+  daemon.reset();  // so that the ring is not emptied
   session = twr_session_create(client, 77);
   twr_sender* sender = twr_sender_open(session, 256);
   TestPayload payload;
@@ -499,7 +500,7 @@ TEST_F(ClientEngineTest, TheMessageAfterAFullRingSaysHowManyItDropped) {
   twr_sender_close(sender);
 }
 
-TEST_F(ClientEngineTest, ASessionsEndSaysWhatNoMessageHasSaid) {
+TEST_F(ClientEngineTest, ASessionsEndReportsLossesThatNoMessageHasReported) {
   daemon.reset();
   ClientSettings chosen = settings(path);
   chosen.queueBytes = 2048;
@@ -518,7 +519,7 @@ TEST_F(ClientEngineTest, ASessionsEndSaysWhatNoMessageHasSaid) {
   EXPECT_EQ(connection->nextText(), "destroyReportingSession 77");
 }
 
-TEST_F(ClientEngineTest, SaysWhyThePlaceWithASocketFailed) {
+TEST_F(ClientEngineTest, ReportsTheErrorOfThePathWithASocket) {
   daemon.reset();  // its socket stays
   ClientSettings chosen = settings(path);
   chosen.socketPaths.push_back(path + "-nobody");
@@ -532,7 +533,7 @@ TEST_F(ClientEngineTest, OpensNoRingOverItsBound) {
   EXPECT_EQ(twr_sender_open(session, TWR_MOST_RING_BYTES + 1), nullptr);
 }
 
-TEST_F(ClientEngineTest, FlushesWhatLiesInRings) {
+TEST_F(ClientEngineTest, FlushesRings) {
   const auto connection = connectWithSession();
   twr_sender* sender = twr_sender_open(session, 0);
   TestPayload payload;
@@ -544,13 +545,13 @@ TEST_F(ClientEngineTest, FlushesWhatLiesInRings) {
   EXPECT_EQ(connection->nextText(), message(1));
 }
 
-// How often the client's thread has gone to sleep.
+// How often the client's thread has waited.
 long waitsOfClientThread() {
   const std::string count = statusOfClientThread("voluntary_ctxt_switches:");
   return count.empty() ? -1 : std::stol(count);
 }
 
-TEST_F(ClientEngineTest, IsNotWokenByWhatOnlyWaitsForADaemon) {
+TEST_F(ClientEngineTest, IsNotWokenByRequestsThatWaitForADaemon) {
   daemon.reset();
   ClientSettings chosen = settings(path);
   chosen.firstDelay = chosen.maxDelay = milliseconds(1'000'000);

@@ -20,7 +20,7 @@ using testing::ElementsAre;
 using testing::IsEmpty;
 using Kind = SessionChange::Kind;
 
-// An outbox of which everything that it gives away is read at once, as far as a test lets it.
+// Runs an outbox and reads the frames that it sends, as many bytes at a time as a test chooses.
 class ClientOutboxTest : public testing::Test {
  protected:
   std::shared_ptr<twr_session> session(std::int64_t identifier = 77) {
@@ -34,7 +34,7 @@ class ClientOutboxTest : public testing::Test {
   static PendingReply reply(const char* name) {
     return {[](void*, const twr_answer*) {}, const_cast<char*>(name), AnswerKind::kPlain, false};
   }
-  // The outbox takes these.
+  // Make changes that the outbox must accept.
   void change(twr_session& session, SessionChange change, PendingReply reply) {
     EXPECT_EQ(outbox->change(session, std::move(change), reply), TWR_OK);
   }
@@ -66,7 +66,7 @@ class ClientOutboxTest : public testing::Test {
            "} 14 0 [" + std::to_string(identifier) + "]";
   }
 
-  // What has been said, frame by frame.
+  // Reads the frames in `bytes`.
   std::vector<RpcFrame> framesOf(std::string_view bytes) {
     std::vector<RpcFrame> frames;
     RpcStrings texts;
@@ -75,7 +75,7 @@ class ClientOutboxTest : public testing::Test {
     EXPECT_EQ(reader.problem(), "");
     return frames;
   }
-  // Everything there is to say goes out.
+  // Sends everything, and returns the frames' texts.
   std::vector<std::string> sayAll() {
     std::vector<std::string> texts;
     for (;;) {
@@ -88,8 +88,8 @@ class ClientOutboxTest : public testing::Test {
       if (bytes.empty()) return texts;
     }
   }
-  // Up to so many bytes go out, and `take` gets the frames that are whole with them. False when there was
-  // nothing.
+  // Sends up to `most` bytes, and calls `take` with each frame that is complete then. False when there was
+  // nothing to send.
   template <class Take>
   bool saySome(std::size_t most, Take take) {
     const std::string bytes(outbox->unsent());
@@ -111,7 +111,7 @@ class ClientOutboxTest : public testing::Test {
     response.result = Value(true);
     outbox->answered(response);
   }
-  // Who was told what since the last call.
+  // The callbacks and their statuses since the last call.
   std::vector<std::string> told() {
     std::vector<std::string> all;
     for (const Delivery& delivery : std::exchange(deliveries, {})) {
@@ -183,7 +183,7 @@ TEST_F(ClientOutboxTest, SendsAFrameAgainWhoseLastByteHadNotGoneOut) {
   send(*one, 2);
   outbox->connected();
   const std::string bytes(outbox->unsent());
-  // All but the last byte: one frame is out, and the other is not.
+  // All bytes but the last: one message is sent, and the other is not.
   const std::size_t create = framesOf(bytes)[0].wireBytes;
   const std::size_t first = framesOf(bytes)[1].wireBytes;
   outbox->sent(create + first);
@@ -220,7 +220,7 @@ TEST_F(ClientOutboxTest, KeepsAStartsReplyOverAReconnect) {
   EXPECT_THAT(told(), ElementsAre("start: done"));
 }
 
-TEST_F(ClientOutboxTest, TellsAStartsCallerWhenItsStopWasLost) {
+TEST_F(ClientOutboxTest, CallsAStartsReplyWhenItsStopWasLost) {
   const auto one = session();
   change(*one, make(Kind::kStart), reply("start"));
   change(*one, make(Kind::kStop), reply("stop"));
@@ -249,19 +249,19 @@ TEST_F(ClientOutboxTest, KeepsAStartAndItsStopThatHadNotGoneOut) {
   EXPECT_THAT(told(), ElementsAre("start: done", "again: done", "stop: done"));
 }
 
-TEST_F(ClientOutboxTest, TellsWhoStartedAStartedSessionTogetherWithTheFirst) {
+TEST_F(ClientOutboxTest, CallsTheReplyOfASecondStartWithTheFirst) {
   const auto one = session();
   change(*one, make(Kind::kStart), reply("first"));
   change(*one, make(Kind::kStart), reply("second"));
   outbox->connected();
-  // The daemon answers the first alone.
+  // The daemon answers only the first start.
   EXPECT_THAT(sayAll(), ElementsAre("createReportingSession 77", "startReportingSessionForID 77 ?",
                                     "startReportingSessionForID 77"));
   answer("startReportingSessionForID");
   EXPECT_THAT(told(), ElementsAre("first: done", "second: done"));
 }
 
-TEST_F(ClientOutboxTest, TellsAStartsCallerByTheStopWhereTheStartIsNotAnswered) {
+TEST_F(ClientOutboxTest, CallsAStartsReplyWithTheStopsAnswerIfTheStartIsNotAnswered) {
   const auto one = session();
   change(*one, make(Kind::kStart), {});
   change(*one, make(Kind::kStart), reply("start"));
@@ -273,7 +273,7 @@ TEST_F(ClientOutboxTest, TellsAStartsCallerByTheStopWhereTheStartIsNotAnswered) 
   EXPECT_THAT(told(), ElementsAre("start: done"));
 }
 
-TEST_F(ClientOutboxTest, TellsAStartsCallerByTheSessionsEnd) {
+TEST_F(ClientOutboxTest, CallsAStartsReplyWhenTheSessionIsDestroyed) {
   const auto one = session();
   change(*one, make(Kind::kStart), reply("start"));
   destroy(*one, reply("destroy"));
@@ -283,7 +283,7 @@ TEST_F(ClientOutboxTest, TellsAStartsCallerByTheSessionsEnd) {
   EXPECT_THAT(told(), ElementsAre("start: done", "destroy: done"));
 }
 
-TEST_F(ClientOutboxTest, TellsAStartsCallerByAnotherType) {
+TEST_F(ClientOutboxTest, CallsAStartsReplyWhenTheTypeChanges) {
   const auto one = session();
   change(*one, make(Kind::kStart), reply("start"));
   change(*one, type(7), {});
@@ -293,7 +293,7 @@ TEST_F(ClientOutboxTest, TellsAStartsCallerByAnotherType) {
   EXPECT_THAT(told(), ElementsAre("start: done"));
 }
 
-TEST_F(ClientOutboxTest, TellsTheStartOfTheRunThatEndedAndNotOfTheNext) {
+TEST_F(ClientOutboxTest, CallsTheStartsReplyOfTheRunThatEndedAndNotOfTheNext) {
   const auto one = session();
   change(*one, make(Kind::kStart), reply("first"));
   change(*one, make(Kind::kStop), {});
@@ -306,13 +306,13 @@ TEST_F(ClientOutboxTest, TellsTheStartOfTheRunThatEndedAndNotOfTheNext) {
   EXPECT_THAT(told(), ElementsAre("second: not connected to the daemon"));
 }
 
-TEST_F(ClientOutboxTest, IgnoresAnAnswerToNothing) {
+TEST_F(ClientOutboxTest, IgnoresAnAnswerToNoRequest) {
   requests["nothing"] = 4711;
   answer("nothing");
   EXPECT_THAT(told(), IsEmpty());
 }
 
-// Else a queue of small requests holds a multiple of its bound.
+// Otherwise a queue of small requests would take a multiple of its bound.
 TEST_F(ClientOutboxTest, CountsTheMemoryOfWhatWaitsAndNotOnlyItsBytes) {
   const auto one = session();
   const std::size_t ofTheSession = outbox->queuedBytes();
@@ -361,7 +361,7 @@ TEST_F(ClientOutboxTest, KeepsRoomForChangesBeyondMessages) {
   EXPECT_EQ(sayAll().back(), "startReportingSessionForID 77 ?");
 }
 
-TEST_F(ClientOutboxTest, BringsAboutWhatFoundNoRoom) {
+TEST_F(ClientOutboxTest, MakesChangesLaterThatFoundNoRoom) {
   const auto one = session();
   while (outbox->queuedBytes() < 65536 + CommandQueue::kReserveBytes - kCommandBytes)
     change(*one, type(1), {});
@@ -378,7 +378,7 @@ TEST_F(ClientOutboxTest, BringsAboutWhatFoundNoRoom) {
   EXPECT_THAT(told(), IsEmpty());
 }
 
-TEST_F(ClientOutboxTest, ForgetsASessionThatCameAndWentWhileThereWasNoRoom) {
+TEST_F(ClientOutboxTest, ForgetsASessionThatWasMadeAndDestroyedWithoutRoom) {
   const auto one = session();
   while (outbox->queuedBytes() < 65536 + CommandQueue::kReserveBytes - kCommandBytes)
     change(*one, type(1), {});
@@ -390,7 +390,7 @@ TEST_F(ClientOutboxTest, ForgetsASessionThatCameAndWentWhileThereWasNoRoom) {
   EXPECT_EQ(std::count(all.begin(), all.end(), "createReportingSession 78"), 0);
 }
 
-TEST_F(ClientOutboxTest, BoundsTheRepliesThatItOwes) {
+TEST_F(ClientOutboxTest, BoundsTheRepliesThatWait) {
   makeOutbox(64 * ClientOutbox::kBytesPerReply);
   const auto one = session();
   outbox->connected();
@@ -441,7 +441,7 @@ TEST_F(ClientOutboxTest, TakesARingsMessagesBackThatHadNotGoneOut) {
   EXPECT_EQ(outbox->queuedBytes(), 0U);
 }
 
-TEST_F(ClientOutboxTest, SendsWhatAClosedSenderLeavesAndItsLoss) {
+TEST_F(ClientOutboxTest, SendsAClosedSendersMessagesAndItsLoss) {
   const auto one = session();
   outbox->connected();
   const auto sender = outbox->openSender(*one, hasForked, 128);
@@ -459,7 +459,7 @@ TEST_F(ClientOutboxTest, SendsWhatAClosedSenderLeavesAndItsLoss) {
   EXPECT_EQ(outbox->messagesDropped(), 1U);
 }
 
-// A flush behind the close held a mark on the sender that had just gone, which then went a second time.
+// A flush after the close had a mark of the removed sender, which was then removed a second time.
 TEST_F(ClientOutboxTest, CountsAClosedSendersLossOnce) {
   const auto one = session();
   outbox->connected();
@@ -491,8 +491,8 @@ TEST_F(ClientOutboxTest, KeepsWhatAClosedSenderLeavesWithoutADaemonInItsPlace) {
   EXPECT_EQ(all[4], "destroyReportingSession 77");
 }
 
-// It is the same promise whether there has been a connection or not.
-TEST_F(ClientOutboxTest, KeepsOfAClosedSenderWhatTheQueueHasRoomForAndTellsTheRestAtItsPlace) {
+// This holds with and without an earlier connection.
+TEST_F(ClientOutboxTest, KeepsAClosedSendersMessagesThatFitTheQueueAndReportsTheRestAtItsPlace) {
   for (const bool wasConnected : {false, true}) {
     SCOPED_TRACE(wasConnected ? "a connection broke" : "there was none yet");
     makeOutbox(2800);
@@ -524,7 +524,7 @@ TEST_F(ClientOutboxTest, KeepsOfAClosedSenderWhatTheQueueHasRoomForAndTellsTheRe
   }
 }
 
-TEST_F(ClientOutboxTest, TellsALossWithTheFirstMessageAfterItWhoeverLostAndWhoeverSaysThat) {
+TEST_F(ClientOutboxTest, ReportsALossWithTheFirstMessageAfterItOfTheSessionOrASender) {
   const auto one = session();
   outbox->connected();
   const auto sender = outbox->openSender(*one, hasForked, 128);
@@ -538,8 +538,8 @@ TEST_F(ClientOutboxTest, TellsALossWithTheFirstMessageAfterItWhoeverLostAndWhoev
   EXPECT_THAT(sayAll(), ElementsAre(said(5)));
 }
 
-// The first message of the ring told what the queue had dropped long after it.
-TEST_F(ClientOutboxTest, TellsNoLossWithAMessageThatWasSaidBeforeIt) {
+// The first message of the ring reported losses of the queue that came long after it.
+TEST_F(ClientOutboxTest, ReportsNoLossWithAnEarlierMessage) {
   makeOutbox(4096);
   const auto one = session();
   const auto sender = outbox->openSender(*one, hasForked, TWR_DEFAULT_RING_BYTES);
@@ -557,7 +557,7 @@ TEST_F(ClientOutboxTest, TellsNoLossWithAMessageThatWasSaidBeforeIt) {
   EXPECT_EQ(sayAll(), expected);
 }
 
-TEST_F(ClientOutboxTest, TellsALossOfOneSenderAmongWhatAnotherHasSaid) {
+TEST_F(ClientOutboxTest, ReportsALossOfOneSenderAmongAnothersMessages) {
   for (const bool lostFirst : {false, true}) {
     const auto one = session();
     outbox->connected();
@@ -579,9 +579,9 @@ TEST_F(ClientOutboxTest, TellsALossOfOneSenderAmongWhatAnotherHasSaid) {
   }
 }
 
-// Whatever is taken or dropped, by the session or its sender, at the call or when a closed sender's ring goes
-// to the queue; however little goes out at a time, and wherever the connection breaks.
-TEST_F(ClientOutboxTest, TellsEveryLossAtItsPlaceHoweverMessagesMix) {
+// Messages are taken or dropped by the session or its sender, at the call or when a closed sender's ring
+// moves to the queue. Few or many bytes are sent at a time, and the connection breaks anywhere.
+TEST_F(ClientOutboxTest, ReportsEveryLossAtItsPlaceHoweverMessagesMix) {
   for (unsigned seed = 0; seed < 100; ++seed) {
     SCOPED_TRACE("seed " + std::to_string(seed));
     std::mt19937 random(seed);
@@ -590,7 +590,8 @@ TEST_F(ClientOutboxTest, TellsEveryLossAtItsPlaceHoweverMessagesMix) {
     const auto one = session();
     std::shared_ptr<twr_sender> sender;
     bool isConnected = false;
-    // What arrives: numbers, and how many losses had been told with each. 0 tells of a loss and nothing else.
+    // The numbers of the messages that arrived, and how many losses were reported by then. A message with the
+    // number 0 only reports losses.
     std::vector<std::pair<std::int64_t, std::uint64_t>> arrived;
     std::uint64_t told = 0;
     const auto take = [&](const RpcFrame& frame) {
@@ -683,7 +684,7 @@ TEST_F(ClientOutboxTest, FinishesABarrierWhenAllBeforeIsOut) {
   EXPECT_EQ(waiter->status, TWR_OK);
 }
 
-TEST_F(ClientOutboxTest, TellsEverybodyOfTheEnd) {
+TEST_F(ClientOutboxTest, CallsAllRepliesAtTheEnd) {
   const auto one = session();
   change(*one, make(Kind::kStart), reply("start"));
   outbox->connected();
@@ -704,7 +705,7 @@ TEST_F(ClientOutboxTest, TellsEverybodyOfTheEnd) {
   EXPECT_THAT(told(), IsEmpty());
 }
 
-// What a daemon makes of what it is told.
+// Keeps the sessions and messages that a daemon knows after the frames that it gets.
 class ModelDaemon {
  public:
   void newConnection() { sessions_.clear(); }
@@ -738,14 +739,14 @@ class ModelDaemon {
   std::map<std::int64_t, std::vector<std::int64_t>> messages_;
 };
 
-// Whatever is asked for, however little goes out at a time, and wherever the connection breaks: in the end
-// the daemon has the sessions as they were last asked for, and every message once and in its order.
-TEST_F(ClientOutboxTest, LeadsTheDaemonToWhatWasAskedForHoweverTheConnectionBreaks) {
+// With any calls, any number of bytes sent at a time, and breaks of the connection anywhere, the daemon has
+// in the end the sessions as they were last asked for, and every message once and in its order.
+TEST_F(ClientOutboxTest, LeadsTheDaemonToTheWantedStateHoweverTheConnectionBreaks) {
   for (unsigned seed = 0; seed < 150; ++seed) {
     SCOPED_TRACE("seed " + std::to_string(seed));
     std::mt19937 random(seed);
     const auto below = [&](std::size_t bound) { return static_cast<std::size_t>(random() % bound); };
-    // In every third run so little room that changes are told late, and messages dropped.
+    // Every third run has so little room that changes are sent late and messages are dropped.
     const bool isTight = seed % 3 == 0;
     makeOutbox(isTight ? 1 : std::size_t{1} << 20U);
     ModelDaemon daemon;
@@ -777,7 +778,7 @@ TEST_F(ClientOutboxTest, LeadsTheDaemonToWhatWasAskedForHoweverTheConnectionBrea
       const std::shared_ptr<twr_session> one = sessions[below(sessions.size())];
       const std::int64_t number = next++;
       if (action == 1) {
-        // With a reply that finds no room, a change is made and says TWR_FULL all the same.
+        // TWR_FULL would only mean that the reply found no room. The change is made.
         (void)outbox->destroy(*one, below(2) == 0 ? reply("d") : PendingReply());
         senders.erase(one.get());
         std::erase(sessions, one);
@@ -826,13 +827,13 @@ TEST_F(ClientOutboxTest, LeadsTheDaemonToWhatWasAskedForHoweverTheConnectionBrea
       EXPECT_EQ(state.configuration, one->wanted.configuration);
     }
     for (auto& [identifier, numbers] : daemon.messages())
-      std::erase(numbers, 0);  // what only tells of a loss
+      std::erase(numbers, 0);  // messages that only report losses
     std::erase_if(daemon.messages(), [](const auto& entry) { return entry.second.empty(); });
     if (!isTight) {
       EXPECT_EQ(daemon.messages(), accepted);
     }
-    // Their ends tell what no message has told. Of a session that the daemon never heard of, which takes a
-    // queue without any room, nothing is told.
+    // The sessions' ends report the losses that no message has reported. Nothing is reported of a session
+    // that the daemon never knew, which needs a queue without any room.
     for (const std::shared_ptr<twr_session>& one : sessions) destroy(*one, {});
     sendAll();
     EXPECT_LE(daemon.toldDropped(), outbox->messagesDropped());

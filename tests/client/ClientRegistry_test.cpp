@@ -43,7 +43,7 @@ bool isMapped(const std::string& library) {
   return false;
 }
 
-// Runs `check` in a child of this process. Whether it was true, and the child ended by itself.
+// Runs `check` in a forked child. True when `check` was, and the child exited normally.
 bool isTrueInChild(const std::function<bool()>& check) {
   const pid_t child = ::fork();
   if (child == 0) ::_exit(check() ? 0 : 1);
@@ -96,13 +96,13 @@ TEST_F(ForkedClientTest, LeavesNoDescriptorInTheChild) {
   ASSERT_EQ(::pipe(pipes), 0);
   const pid_t child = ::fork();
   if (child == 0) {
-    // Stays until the parent has seen what it wants to see.
+    // Keeps the child until the parent has finished its checks.
     char byte = 0;
     ::close(pipes[1]);
     ::_exit(::read(pipes[0], &byte, 1) == 0 ? 0 : 1);
   }
   destroyClient(0);
-  // Were the socket open in the child, too, this would not be the connection's end.
+  // If the socket were open in the child, too, the connection would not end here.
   EXPECT_TRUE(connection->waitForEnd());
   ::close(pipes[0]);
   ::close(pipes[1]);
@@ -176,7 +176,7 @@ TEST_F(ForkedClientTest, MayForkInsideACallback) {
   EXPECT_EQ(connection->nextText(), message(2));
 }
 
-// libtwreporting as programs load it.
+// Loads libtwreporting as programs do.
 class LoadedLibrary {
  public:
   LoadedLibrary() : handle_(::dlopen(TONEWERK_REPORTING_LIBRARY, RTLD_NOW | RTLD_LOCAL)) {
@@ -197,17 +197,17 @@ class LoadedLibrary {
   void* handle_;
 };
 
-// Its clients are never destroyed; this keeps the sanitizer from calling their memory lost.
+// Its clients are never destroyed. This keeps the sanitizer from reporting their memory as leaked.
 std::vector<void*>& abandoned() {
   static auto* all = new std::vector<void*>;
   return *all;
 }
 
-// This process's threads, those of a sanitizer included, which begin with the first that the program starts.
+// This process's threads, with those of a sanitizer, which start with the program's first thread.
 std::size_t threadsBefore() {
   pid_t first = 0;
   std::thread([&] { first = ::gettid(); }).join();
-  // A joined thread may still be seen for a moment.
+  // A joined thread may still be listed for a moment.
   while (std::filesystem::exists("/proc/self/task/" + std::to_string(first))) std::this_thread::yield();
   return entriesOf("/proc/self/task");
 }
@@ -225,7 +225,7 @@ TEST(UnloadedLibraryTest, LeavesNoThreadNoDescriptorAndNoHandler) {
   TemporaryDirectory directory;
   ScriptedServer daemon(directory.path("reporting.sock"));
   const std::string path = directory.path("reporting.sock");
-  { const LoadedLibrary once; }  // what the loader itself keeps for ever
+  { const LoadedLibrary once; }  // the loader keeps some memory after the first time
   const std::size_t threads = threadsBefore();
   const std::size_t descriptors = entriesOf("/proc/self/fd");
   for (int at = 0; at < 100; ++at) {
@@ -250,7 +250,7 @@ TEST(UnloadedLibraryTest, LeavesNoThreadNoDescriptorAndNoHandler) {
     ASSERT_EQ(entriesOf("/proc/self/fd"), descriptors);
     ASSERT_FALSE(isMapped("libtwreporting"));
   }
-  // Were its handlers still there, the fork would run into unmapped memory.
+  // If its handlers were still registered, the fork would call unmapped memory.
   EXPECT_TRUE(isTrueInChild([] { return true; }));
 }
 

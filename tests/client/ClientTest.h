@@ -21,13 +21,13 @@
 
 namespace tonewerk {
 
-// What a client called back, for a test on another thread to wait for.
+// Collects a client's callbacks, so that a test on another thread can wait for them.
 //
 //   twr_session_start(session, AnswerLog::note, log.as("stopped"));
 //   EXPECT_EQ(log.next(), "stopped: done");
 class AnswerLog {
  public:
-  // A context by which answers are known. Valid as long as this object.
+  // Makes a callback's context, whose name marks its answers. Valid as long as this object.
   void* as(std::string name, std::function<void(const twr_answer&)> also = nullptr) {
     const MutexLock lock(mutex_);
     names_.push_back({this, std::move(name), std::move(also)});
@@ -42,7 +42,7 @@ class AnswerLog {
     static_cast<AnswerLog*>(context)->add("state " + std::to_string(state));
   }
 
-  // The next answer that was not asked for yet; a test failure when none comes.
+  // Waits for the next answer; a test failure when none comes.
   std::string next() {
     const auto until = std::chrono::steady_clock::now() + std::chrono::milliseconds(kScriptPatienceMs);
     MutexLock lock(mutex_);
@@ -78,7 +78,7 @@ class AnswerLog {
   std::deque<Name> names_ GUARDED_BY(mutex_);
 };
 
-// A client of a scripted daemon, by the C interface, whose delays are short.
+// Runs a client with short delays against a scripted daemon, through the C interface.
 class ClientTest : public testing::Test {
  protected:
   ~ClientTest() override { twr_client_destroy(client, 0); }
@@ -100,7 +100,7 @@ class ClientTest : public testing::Test {
   void destroyClient(int timeout = kScriptPatienceMs) {
     twr_client_destroy(std::exchange(client, nullptr), timeout);
   }
-  // A session of 77, and the connection on which it has been created.
+  // Makes the session 77, and returns the connection on which it was created.
   std::unique_ptr<ScriptedConnection> connectWithSession() {
     session = twr_session_create(client, 77);
     auto connection = daemon->accept();
@@ -115,7 +115,7 @@ class ClientTest : public testing::Test {
     twr_put_double(payload.get(), "twreporting_timestamp", 1.5);
     return twr_session_send(session, TWR_CATEGORY_VOLUME, TWR_TYPE_GENERIC, payload.get(), reply, context);
   }
-  // Makes a session of 77 and sends 0, 1, 2 ... until the queue has refused two. How many it took.
+  // Makes the session 77 and sends 0, 1, 2 ... until the queue has refused two. Returns how many it took.
   int fillQueue() {
     session = twr_session_create(client, 77);
     int taken = 0;
@@ -129,7 +129,7 @@ class ClientTest : public testing::Test {
     EXPECT_EQ(twr_client_get_info(client, &known), TWR_OK);
     return known;
   }
-  // What the frame of send(number) is.
+  // The text of the frame that send(number) makes.
   static std::string message(int number, const std::string& more = "") {
     return "sendMessage {\"number\":" + std::to_string(number) + ",\"twreporting_timestamp\":1.5" + more +
            "} 14 0 [77]";

@@ -8,7 +8,7 @@
 
 namespace tonewerk {
 
-// What a shell's command writes, and a test failure when it fails.
+// Returns what a shell command prints. A test failure when the command fails.
 inline std::string outputOfCommand(const std::string& command) {
   std::string output;
   FILE* pipe = ::popen((command + " 2>&1").c_str(), "r");

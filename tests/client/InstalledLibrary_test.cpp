@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-// The libraries as somebody else's build finds them.
+// Tests that other programs' builds find the libraries.
 #include <filesystem>
 #include <fstream>
 #include <gmock/gmock.h>
@@ -63,13 +63,13 @@ class InstalledLibraryTest : public testing::Test {
   static std::string flags(const std::string& where, const std::string& options) {
     return "$(PKG_CONFIG_PATH=" + where + "/pkgconfig pkg-config " + options + " twreporting)";
   }
-  // With the packages of a directory.
+  // Builds with the packages of a directory.
   void compile(const std::string& where, const std::string& options, const std::string& program) {
     outputOfCommand(TONEWERK_C_COMPILER " -std=c11 -Wall -Wextra -Wpedantic -Werror" + sanitize() + " " +
                     directory.path("program.c") + " -o " + directory.path(program) + " " +
                     flags(where, options));
   }
-  // The program reports to a daemon, and says the version.
+  // The program sends reports to a daemon and prints the version.
   void expectReports(const std::string& program, const std::string& environment = "") {
     ScriptedServer daemon(directory.path("reporting.sock"));
     EXPECT_THAT(outputOfCommand(environment + " " + program + " " + directory.path("reporting.sock")),
@@ -89,7 +89,7 @@ TEST_F(InstalledLibraryTest, IsFoundByPkgConfig) {
 }
 
 TEST_F(InstalledLibraryTest, IsFoundByPkgConfigAsAStaticLibrary) {
-  // Where there is no other, the linker takes that.
+  // If there is no shared library, the linker takes the static one.
   for (const auto& entry : std::filesystem::directory_iterator(libraryDirectory(prefix)))
     if (entry.path().string().find("libtwreporting.so") != std::string::npos)
       std::filesystem::remove(entry.path());
@@ -101,7 +101,7 @@ TEST_F(InstalledLibraryTest, IsFoundByPkgConfigAsAStaticLibrary) {
 TEST_F(InstalledLibraryTest, IsFoundByPkgConfigBeforeItIsInstalled) {
   compile(TONEWERK_BUILD_DIRECTORY, "--cflags --libs", "shared");
   EXPECT_THAT(neededBy(directory.path("shared")), testing::HasSubstr("libtwreporting.so.0"));
-  // By itself: the program knows where the library was built.
+  // Without a variable, because the program contains the path at which the library was built.
   expectReports(directory.path("shared"), "LD_LIBRARY_PATH=");
 }
 

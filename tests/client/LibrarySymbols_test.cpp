@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-// What the libraries show of themselves.
+// Tests which symbols the libraries export.
 #include <fstream>
 #include <gmock/gmock.h>
 #include <iterator>
@@ -22,7 +22,7 @@ std::set<std::string> functionsOfTheHeader() {
   return names;
 }
 
-// The third column, without the version behind a name; only what is defined.
+// The names of the defined symbols, from the third column, without their versions.
 std::set<std::string> symbolsOf(const std::string& library, const std::string& options) {
   std::istringstream lines(outputOfCommand(TONEWERK_NM " --defined-only " + options + " " + library));
   std::set<std::string> names;

@@ -108,7 +108,7 @@ TEST(MessageFrameTest, StampsAPayloadThatSaysTheNameElsewhere) {
   EXPECT_EQ(read.asMap()->size(), 4U);
 }
 
-TEST(MessageFrameTest, PassesAProgramsScribblesOn) {
+TEST(MessageFrameTest, PassesAnOverwrittenPayloadOn) {
   const std::array<unsigned char, 4> scribbles{0xC1, 0xDF, 0xFF, 0xFF};
   std::string bytes;
   appendMessageFrame(bytes, std::nullopt, {1, 0, kTime, 0, 1, scribbles}, 0, {});
@@ -129,7 +129,7 @@ TEST(MessageFrameTest, FitsAFrameUpToItsLastByte) {
   EXPECT_FALSE(fitsMessageFrame(0, kMaxFrameBytes));
   EXPECT_FALSE(fitsMessageFrame(SIZE_MAX, 1));
 
-  // And what fits is one that the daemon reads, with everything in it as long as can be.
+  // The daemon reads a frame that just fits, with all its parts as long as possible.
   TestPayload payload(most);
   std::string text(most - 6, 'x');
   ASSERT_EQ(twr_put_text(payload.get(), "n", text.c_str()), TWR_TOO_LARGE);

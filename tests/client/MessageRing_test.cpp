@@ -15,7 +15,7 @@
 namespace tonewerk {
 namespace {
 
-// A ring, and what its session has lost.
+// Holds a ring and its session's count of losses.
 struct Losses {
   LossCount losses;
 };
@@ -24,7 +24,7 @@ class Ring : public Losses, public MessageRing {
   explicit Ring(std::size_t bytes) : MessageRing(bytes, losses) {}
 };
 
-// A payload of one text entry, `size` bytes long in all, told apart by its fill.
+// A payload with one text entry, `size` bytes long in all, filled with a character of choice.
 class Text {
  public:
   Text(std::size_t size, char fill) : bytes_(size, fill) {
@@ -126,13 +126,14 @@ TEST(MessageRingTest, TakesTheLargestMessageAtAnyPlaceOfTheRing) {
     ASSERT_EQ(ring.push(7, 3, Text(most, static_cast<char>(shift))), TWR_OK);
     ASSERT_EQ(textOf(*ring.front()), std::string(most, static_cast<char>(shift)));
     ring.pop();
-    ASSERT_EQ(ring.push(1, 0, Text(1, 'x')), TWR_OK);  // 40 bytes: every place comes up
+    ASSERT_EQ(ring.push(1, 0, Text(1, 'x')),
+              TWR_OK);  // 40 bytes, so that messages begin at every place of the ring
     ASSERT_EQ(textOf(*ring.front()), "x");
     ring.pop();
   }
 }
 
-TEST(MessageRingTest, RefusesForEverWhatCanNeverFit) {
+TEST(MessageRingTest, RefusesMessagesThatCanNeverFit) {
   Ring ring(256);
   EXPECT_EQ(ring.push(1, 0, Text(256 - MessageRing::kHeaderBytes + 1, 'a')), TWR_TOO_LARGE);
   EXPECT_EQ(ring.dropped(), 1U);
@@ -186,7 +187,7 @@ TEST(MessageRingTest, CountsItsLossesAsTheSessionsWhichHasOthers) {
   EXPECT_EQ(ring.dropped(), 1U);
 }
 
-// What a ring of messages is, said with a queue of them.
+// Models a ring of messages by a queue.
 struct Model {
   struct Message {
     std::uint32_t category;
@@ -222,7 +223,7 @@ RC_GTEST_PROP(MessageRingTest, DoesWhatAQueueWithALimitDoes, ()) {
   const std::size_t capacity = std::size_t{64} << *rc::gen::inRange<unsigned>(0, 5);
   Ring ring(capacity);
   Model model(capacity);
-  // Positive: a push of a text so long; else a pop.
+  // A positive number pushes a text of that length; any other pops.
   const auto steps = *rc::gen::container<std::vector<int>>(rc::gen::weightedOneOf<int>(
       {{3, rc::gen::inRange(0, 100)}, {1, rc::gen::inRange(0, 1100)}, {3, rc::gen::just(-1)}}));
   std::uint32_t number = 0;
@@ -248,7 +249,7 @@ RC_GTEST_PROP(MessageRingTest, DoesWhatAQueueWithALimitDoes, ()) {
 
 TEST(MessageRingTest, LosesAndMixesNothingBetweenTwoThreads) {
   constexpr std::uint32_t kMessages = 20'000;
-  Ring ring(512);  // small, so that it runs full and wraps all the time
+  Ring ring(512);  // small, so that it is often full and often wraps
   std::atomic<bool> isDone{false};
   std::thread producer([&] {
     for (std::uint32_t number = 0; number < kMessages; ++number) {
@@ -261,7 +262,7 @@ TEST(MessageRingTest, LosesAndMixesNothingBetweenTwoThreads) {
   const auto take = [&] {
     const std::optional<RingMessage> message = ring.front();
     if (!message) return false;
-    // What was taken and what was lost before is all there was before.
+    // The messages taken and lost before this one are all earlier messages.
     EXPECT_EQ(message->category, taken + message->lostBefore);
     EXPECT_EQ(textOf(*message), std::string(message->category % 97, static_cast<char>(message->category)));
     ++taken;

@@ -11,7 +11,7 @@
 
 namespace tonewerk {
 
-// The one frame that `bytes` are; none when they are anything else.
+// Reads `bytes`, which must be exactly one frame; none otherwise.
 inline std::optional<RpcFrame> frameOf(std::string_view bytes) {
   const std::size_t size = bytes.size();
   RpcStrings texts;

@@ -39,7 +39,7 @@ TEST_F(OutgoingBatchTest, CountsAFrameAsGoneWithItsLastByte) {
   EXPECT_EQ(batch.unsent(), "");
 }
 
-TEST_F(OutgoingBatchTest, LetsGoOfAFrameWithoutBytesAfterThoseBeforeIt) {
+TEST_F(OutgoingBatchTest, SendsAFrameWithoutBytesAfterThoseBeforeIt) {
   add("abc", 1);
   add("", 2);
   EXPECT_THAT(identifiers(batch.sent(0)), testing::IsEmpty());

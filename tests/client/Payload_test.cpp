@@ -20,7 +20,7 @@
 namespace tonewerk {
 namespace {
 
-// What the daemon reads of a message with this payload; an empty map for anything wrong.
+// The map that the daemon reads from a message with this payload; empty on any problem.
 ValueMap readBack(const twr_payload& payload) {
   std::string bytes;
   appendMessageFrame(bytes, std::nullopt, {1, 0, 0, 0, payload.entries, {payload.bytes, payload.size}}, 0,
@@ -34,7 +34,7 @@ ValueMap readBack(const twr_payload& payload) {
 
 class PayloadTest : public testing::Test {
  protected:
-  // The first failure and what is still there.
+  // The first failure, and the entries that are still there.
   void expectProblem(twr_status problem) {
     EXPECT_EQ(twr_payload_problem(p), problem);
     EXPECT_EQ(twr_put_int(p, "later", 1), problem);
@@ -252,7 +252,7 @@ TEST_F(PayloadTest, IsSafeWithoutAPayload) {
   EXPECT_EQ(twr_close(nullptr), TWR_INVALID);
 }
 
-// Names of the C interface end at their first zero byte.
+// A name of the C interface ends at its first zero byte.
 ValueMap withoutZeros(const ValueMap& map);
 
 Value withoutZeros(const Value& value) {
@@ -324,7 +324,7 @@ TEST(PayloadReadingTest, ReadsAPayloadAsAMap) {
   EXPECT_EQ(mapOf(payload), (ValueMap{{"a", "1"}, {"b", ValueMap{{"c", true}}}}));
 }
 
-TEST(PayloadReadingTest, ReadsNoMapOutOfScribbledMemory) {
+TEST(PayloadReadingTest, ReadsNoMapOutOfOverwrittenMemory) {
   TestPayload payload;
   twr_put_text(payload.get(), "a", "1");
   for (std::uint32_t at = 0; at < payload->size; ++at) {

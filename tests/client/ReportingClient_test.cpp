@@ -28,7 +28,7 @@ namespace {
 using std::chrono::milliseconds;
 using testing::ElementsAre;
 
-// Against the daemon's own listener.
+// Connects to the daemon's own listener.
 class ReportingClientTest : public testing::Test {
  protected:
   ReportingClientTest() {
@@ -124,7 +124,7 @@ TEST_F(ReportingClientTest, FailsOnceTheDaemonIsGone) {
   EXPECT_EQ(client.notify("takeInt64", {Value(1)}), std::errc::not_connected);
 }
 
-TEST_F(ReportingClientTest, HandsOutTheLastAnswersBeforeItFails) {
+TEST_F(ReportingClientTest, DeliversTheLastAnswersBeforeItFails) {
   bool isAnswered = false;
   ASSERT_FALSE(client.request("echo", {Value(ValueMap{})}, [&](const Answer&) { isAnswered = true; }));
   ASSERT_TRUE(record.waitForRequests(1));
@@ -168,8 +168,8 @@ TEST_F(ReportingClientTest, RefusesWhatNoFrameCarriesAndStaysConnected) {
   EXPECT_TRUE(call("takeInt64", {Value(1)}));
 }
 
-// The daemon does not read while too many replies are unread, so a client that only sends would wait for a
-// daemon that waits for it.
+// The daemon does not read while too many replies are unread. A client that only sends would therefore wait
+// for a daemon that waits for the client.
 TEST_F(ReportingClientTest, TakesAnswersInWhileItSendsALot) {
   std::size_t answers = 0;
   const Arguments arguments{Value(ValueMap{{"text", std::string(500'000, 'x')}})};
@@ -187,7 +187,7 @@ TEST_F(ReportingClientTest, ReconnectsAndForgetsWhatWaited) {
   EXPECT_FALSE(isAnswered);
 }
 
-TEST_F(ReportingClientTest, TakesTheFirstPathOnWhichSomebodyListens) {
+TEST_F(ReportingClientTest, TakesTheFirstPathOnWhichADaemonListens) {
   EXPECT_EQ(ReportingClient().socketPath(), "");
   EXPECT_FALSE(client.connect({directory.path("nobody.sock"), path}));
   EXPECT_EQ(client.socketPath(), path);
@@ -205,7 +205,7 @@ TEST_F(ReportingClientTest, PutsAMessagesArgumentsInOrder) {
             (Arguments{Value(message), Value(7), Value(8), Value(ValueArray{1, -2})}));
 }
 
-// A daemon whose side the test plays itself.
+// Connects to a socket on which the test itself plays the daemon.
 class OddDaemonTest : public testing::Test {
  protected:
   OddDaemonTest() {
@@ -232,14 +232,14 @@ TEST_F(OddDaemonTest, GivesUpSendingToADaemonThatReadsNothing) {
   EXPECT_FALSE(client.isConnected());
 }
 
-TEST_F(OddDaemonTest, LivesOnWhenTheDaemonCloses) {
+TEST_F(OddDaemonTest, SurvivesTheDaemonsClosing) {
   daemon.reset();
   const std::error_code error = client.notify("m", {});
   EXPECT_EQ(error, std::errc::broken_pipe);
   EXPECT_FALSE(client.isConnected());
 }
 
-TEST_F(OddDaemonTest, EndsWhenTheDaemonTalksSomethingElse) {
+TEST_F(OddDaemonTest, EndsWhenTheDaemonSendsInvalidData) {
   const std::string request = fromHex("93 02 A1 6D 90");
   for (const std::string& nonsense : {std::string("HTTP/1.1 400"), request, fromHex("94 01 01 C0 C4 00")}) {
     ASSERT_EQ(::write(daemon.get(), nonsense.data(), nonsense.size()), static_cast<ssize_t>(nonsense.size()));
@@ -250,7 +250,7 @@ TEST_F(OddDaemonTest, EndsWhenTheDaemonTalksSomethingElse) {
   }
 }
 
-TEST_F(OddDaemonTest, ReadsAnErrorThatIsNoMap) {
+TEST_F(OddDaemonTest, ReadsAnErrorThatIsNotAMap) {
   std::optional<Answer> answer;
   ASSERT_FALSE(client.request("m", {}, [&](const Answer& given) { answer = given; }));
   const std::string response = fromHex("94 01 01 A2 6E6F C0");

@@ -23,23 +23,23 @@
 
 namespace tonewerk {
 
-// Long enough for the slowest machine; nothing waits so long unless it fails.
+// Long enough for the slowest machine. Only a failing test waits so long.
 inline constexpr int kScriptPatienceMs = 30'000;
 
-// A frame's method and parameters: `setServiceType 7 77`, with a `?` behind when an answer is wanted.
+// A frame's method and parameters, such as `setServiceType 7 77`, followed by `?` when it is a request.
 inline std::string textOf(const RpcFrame& frame) {
   std::string text = frame.method;
   for (const Argument& argument : frame.arguments) text += " " + (argument ? argument->text() : "nil");
   return frame.kind == RpcFrame::Kind::kRequest ? text + " ?" : text;
 }
 
-// A connection as a daemon sees it that does what a test says and nothing else. Whatever does not come in
-// time is a test failure.
+// The daemon's end of a connection. It only does what the test calls. A frame that does not come in time is a
+// test failure.
 class ScriptedConnection {
  public:
   explicit ScriptedConnection(FileDescriptor socket) : socket_(std::move(socket)) {}
 
-  // The next frame; one without a method when none came.
+  // Reads the next frame; one without a method when none came.
   RpcFrame next() {
     std::string_view rest = unread_;
     RpcFrameReader::Result result = reader_.next(rest);
@@ -58,7 +58,7 @@ class ScriptedConnection {
     while (texts.size() < count) texts.push_back(nextText());
     return texts;
   }
-  // The next frame's first parameter, which is a map.
+  // Reads the next frame and returns its first parameter, which must be a map.
   ValueMap nextMap() {
     const RpcFrame frame = next();
     const bool hasMap =
@@ -67,7 +67,7 @@ class ScriptedConnection {
     return hasMap ? *frame.arguments[0]->asMap() : ValueMap();
   }
 
-  // Whether the client ends the connection, or its half of it, without another frame.
+  // True when the client closes the connection, or its half of it, without another frame.
   bool waitForEnd() {
     while (readMore(kScriptPatienceMs)) {
       std::string_view rest = unread_;
@@ -91,7 +91,7 @@ class ScriptedConnection {
     EXPECT_EQ(::send(socket_.get(), bytes.data(), bytes.size(), MSG_NOSIGNAL),
               static_cast<ssize_t>(bytes.size()));
   }
-  // Reads so many bytes and forgets them.
+  // Reads and drops so many bytes.
   void swallow(std::size_t bytes) {
     std::array<char, 4096> buffer;
     while (bytes > 0) {
@@ -121,7 +121,7 @@ class ScriptedConnection {
   bool hasEnded_ = false;
 };
 
-// A socket at which clients knock.
+// Listens on a socket and accepts clients.
 class ScriptedServer {
  public:
   explicit ScriptedServer(const std::string& path) {
@@ -132,7 +132,7 @@ class ScriptedServer {
     EXPECT_EQ(::listen(listener_.get(), 8), 0);
   }
 
-  // The next client; a test failure, and null, when none comes in time.
+  // Accepts the next client; a test failure, and null, when none comes in time.
   std::unique_ptr<ScriptedConnection> accept(int patience = kScriptPatienceMs) {
     pollfd polled{listener_.get(), POLLIN, 0};
     if (::poll(&polled, 1, patience) != 1) {
@@ -142,7 +142,7 @@ class ScriptedServer {
     return std::make_unique<ScriptedConnection>(
         FileDescriptor(::accept4(listener_.get(), nullptr, nullptr, SOCK_CLOEXEC)));
   }
-  // Whether somebody has connected and not been accepted.
+  // True when a client has connected and was not accepted yet.
   bool hasCaller() const {
     pollfd polled{listener_.get(), POLLIN, 0};
     return ::poll(&polled, 1, 0) == 1;

@@ -24,7 +24,7 @@ TEST(SessionStateTest, IsStoppedByAnotherType) {
   EXPECT_FALSE(state.isStarted);
 }
 
-TEST(SessionStateTest, BeginsAnewWhenItIsCreated) {
+TEST(SessionStateTest, IsResetWhenItIsCreated) {
   SessionState state{true, 7, {{"a", 1}}, true};
   state.apply({Kind::kCreate, 0, {}});
   EXPECT_TRUE(state.exists);

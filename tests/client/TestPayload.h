@@ -8,7 +8,7 @@
 
 namespace tonewerk {
 
-// A payload with its memory.
+// Holds a payload and its memory.
 class TestPayload {
  public:
   explicit TestPayload(std::size_t bytes = 4096) : memory_(bytes) {

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What a real-time thread's sending must not do, and that the traps that watch it work.
+// Tests that a real-time thread's sending avoids forbidden actions, and that the traps for these work.
 #include <gmock/gmock.h>
 #include <string>
 #include <sys/syscall.h>

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The C++ interface: that it says what the C interface says, and that nothing is used after its end.
+// Tests that the C++ interface makes the calls of the C interface, and uses no object after its end.
 #include <future>
 #include <gmock/gmock.h>
 #include <memory>
@@ -29,7 +29,7 @@ using testing::ElementsAre;
 
 constexpr std::chrono::seconds kPatience{30};
 
-// What comes in a callback, to wait for.
+// Lets a test wait for the result of a callback.
 template <class T>
 class Later {
  public:
@@ -52,7 +52,8 @@ class ReportingHppTest : public testing::Test {
     ClientOptions options;
     options.socketPath = path;
     Client client(std::move(options));
-    client.setCloseTimeout(std::chrono::milliseconds(0));  // the script does not hang up
+    client.setCloseTimeout(
+        std::chrono::milliseconds(0));  // the scripted daemon does not close the connection
     return client;
   }
 
@@ -164,7 +165,7 @@ TEST_F(ReportingHppTest, GivesAnswersToKeep) {
   EXPECT_EQ(answer->errorMessage, "why");
 }
 
-TEST_F(ReportingHppTest, LetsGoOfAReplyThatIsNotTaken) {
+TEST_F(ReportingHppTest, DropsAReplyThatIsNotTaken) {
   const auto token = std::make_shared<int>(1);
   Client client = make();
   Payload<4> tooSmall;
@@ -175,9 +176,9 @@ TEST_F(ReportingHppTest, LetsGoOfAReplyThatIsNotTaken) {
   EXPECT_EQ(token.use_count(), 1);
 }
 
-TEST_F(ReportingHppTest, TellsWhoStillWaitsWhenTheClientGoes) {
+TEST_F(ReportingHppTest, CallsWaitingRepliesWhenTheClientIsDestroyed) {
   Later<Answer> stopped;
-  std::unique_ptr<ScriptedConnection> connection;  // which the daemon keeps
+  std::unique_ptr<ScriptedConnection> connection;  // the daemon keeps it open
   {
     Client client = make();
     Session session(client, 77);
@@ -191,7 +192,7 @@ TEST_F(ReportingHppTest, TellsWhoStillWaitsWhenTheClientGoes) {
   EXPECT_EQ(answer->status, Status::kDestroyed);
 }
 
-TEST_F(ReportingHppTest, ASessionAndASenderOutliveWhatTheyWereMadeOf) {
+TEST_F(ReportingHppTest, ASessionAndASenderKeepTheirOwnersAlive) {
   std::optional<Client> client(make());
   std::optional<Session> session(std::in_place, *client, 77);
   std::optional<Sender> sender(std::in_place, *session);
@@ -209,7 +210,7 @@ TEST_F(ReportingHppTest, ASessionAndASenderOutliveWhatTheyWereMadeOf) {
               ElementsAre("createReportingSession 77", "startReportingSessionForID 77",
                           R"(sendMessage {"a":1,"twreporting_timestamp":1.5} 7 18 [77])"));
   EXPECT_EQ(sender->dropped(), 0U);
-  // With the sender go the session and the client, which waits for the daemon to hang up.
+  // The sender's end destroys the session and the client, which waits until the daemon closes the connection.
   const auto gone = std::async(std::launch::async, [&] { sender.reset(); });
   EXPECT_EQ(connection->nextText(), "destroyReportingSession 77");
   EXPECT_TRUE(connection->waitForEnd());
@@ -242,7 +243,7 @@ TEST_F(ReportingHppTest, AMovedObjectIsEmptyAndItsCallsDoNothing) {
   EXPECT_FALSE(newSender);  // NOLINT(bugprone-use-after-move)
 }
 
-TEST_F(ReportingHppTest, TellsHowTheClientIsDoing) {
+TEST_F(ReportingHppTest, ReturnsTheClientsState) {
   std::promise<void> connected;
   ClientOptions options;
   options.socketPath = path;

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-// The C interface against a daemon that does what the tests say.
+// Tests the C interface with a scripted daemon.
 #include "tonewerk/reporting.h"
 
 #include <gmock/gmock.h>
@@ -79,7 +79,7 @@ TEST_F(ReportingTest, CallsBackInTheOrderOfTheAnswers) {
   EXPECT_EQ(log.next(), "stop: done");
 }
 
-TEST_F(ReportingTest, HandsOutWhatTheDaemonRefused) {
+TEST_F(ReportingTest, DeliversTheDaemonsError) {
   const auto connection = connectWithSession();
   std::string domain;
   std::string words;
@@ -208,7 +208,7 @@ TEST_F(ReportingTest, SendsAnyMethodByItsName) {
   EXPECT_THAT(daemon->accept()->nextTexts(2), ElementsAre("newMethod 7 nil", "bare ?"));
 }
 
-TEST_F(ReportingTest, TellsOfTheKilledDaemonByTheConnectionsEnd) {
+TEST_F(ReportingTest, ReportsTheKilledDaemonByTheConnectionsEnd) {
   ASSERT_EQ(twr_client_kill_service(client, AnswerLog::note, log.as("kill")), TWR_OK);
   auto connection = daemon->accept();
   EXPECT_EQ(connection->nextText(), "killService ?");
@@ -216,7 +216,7 @@ TEST_F(ReportingTest, TellsOfTheKilledDaemonByTheConnectionsEnd) {
   EXPECT_EQ(log.next(), "kill: not connected to the daemon");
 }
 
-TEST_F(ReportingTest, RefusesWhatCannotBe) {
+TEST_F(ReportingTest, RefusesInvalidArguments) {
   TestPayload payload;
   twr_payload list;
   twr_payload_init_list(&list, nullptr, 0);
@@ -278,7 +278,7 @@ TEST_F(ReportingTest, RefusesAFrameOverItsLimitAtTheCall) {
   ASSERT_EQ(twr_put_text(&list, nullptr, text.c_str()), TWR_OK);
   ASSERT_EQ(twr_put_text(&list, nullptr, text.substr(0, 64).c_str()), TWR_OK);
   EXPECT_EQ(twr_client_request(client, "m", &list, nullptr, nullptr), TWR_TOO_LARGE);
-  // What was refused was not sent, and the connection lives.
+  // Refused requests are not sent, and the connection stays open.
   EXPECT_EQ(send(1), TWR_OK);
   EXPECT_EQ(connection->nextText(), message(1));
 }
@@ -294,7 +294,7 @@ TEST_F(ReportingTest, RefusesAConfigurationThatHasGrownOverAFrame) {
   EXPECT_EQ(twr_session_set_configuration(session, other.get(), nullptr, nullptr), TWR_TOO_LARGE);
 }
 
-TEST_F(ReportingTest, CarriesAsLargeAMessageAsAFrameMayBe) {
+TEST_F(ReportingTest, CarriesTheLargestMessageThatFitsAFrame) {
   ClientSettings large = settings(path);
   large.queueBytes = 2 * kMaxFrameBytes;
   makeClientWith(large);
@@ -314,7 +314,7 @@ TEST_F(ReportingTest, KnowsNoMoreSessionsThanTheDaemon) {
   EXPECT_NE(twr_session_create(client, 9), nullptr);
 }
 
-TEST_F(ReportingTest, SaysEveryStatusInWords) {
+TEST_F(ReportingTest, DescribesEveryStatus) {
   for (int status = TWR_OK; status <= TWR_DESTROYED; ++status)
     EXPECT_STRNE(twr_status_text(static_cast<twr_status>(status)), "unknown status");
   EXPECT_STREQ(twr_status_text(static_cast<twr_status>(15)), "unknown status");
@@ -325,7 +325,7 @@ TEST_F(ReportingTest, TakesTheOptionsOfAnOlderProgram) {
   twr_client_options options{};
   options.size = offsetof(twr_client_options, queue_bytes);
   options.socket_path = path.c_str();
-  options.flags = TWR_CLIENT_ONCE;  // beyond what the program says it knows
+  options.flags = TWR_CLIENT_ONCE;  // beyond the size that the program has given
   twr_client* other = twr_client_create(&options);
   daemon.reset();
   EXPECT_EQ(twr_client_connect(other, kScriptPatienceMs), TWR_NOT_CONNECTED);
@@ -360,8 +360,8 @@ TEST_F(ReportingTest, MayBeAskedForMoreInsideACallback) {
   EXPECT_EQ(log.next(), "inner: done");
 }
 
-// It used to do nothing there, and a program that let go of its last share in a reply kept the client for
-// good.
+// It once did nothing there, and a program that dropped its last reference in a reply kept the client for
+// ever.
 TEST_F(ReportingTest, MayBeDestroyedInsideItsOwnCallback) {
   ClientSettings chosen = settings(path);
   chosen.stateChanged = AnswerLog::noteState;
@@ -374,16 +374,16 @@ TEST_F(ReportingTest, MayBeDestroyedInsideItsOwnCallback) {
   ASSERT_EQ(send(1, AnswerLog::note, last), TWR_OK);
   ASSERT_EQ(send(2, AnswerLog::note, log.as("pending")), TWR_OK);
   const std::uint32_t first = connection->next().identifier;
-  connection->next();  // so that nothing but the end is left to be read
+  connection->next();  // so that only the end of the connection is left to read
   connection->answer(first, std::nullopt);
   EXPECT_EQ(log.next(), "last: done");
   EXPECT_EQ(log.next(), "pending: the client was destroyed before the answer came");
   EXPECT_TRUE(connection->waitForEnd());
-  client = makeClient(settings(path));  // and buries the other
+  client = makeClient(settings(path));  // also frees the other client
   EXPECT_THAT(log.rest(), IsEmpty());
 }
 
-TEST_F(ReportingTest, ClientsMayGoWhileOthersAreAsked) {
+TEST_F(ReportingTest, ClientsMayBeDestroyedWhileOthersAreUsed) {
   const auto connection = connectWithSession();
   std::thread other([&] {
     for (int at = 0; at < 50; ++at) {

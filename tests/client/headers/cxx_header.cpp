@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-// Compiled as C++17 and as C++20: the C++ interface as strangers include it, every template in use.
+// Compiled as C++17 and as C++20: the C++ interface as other programs include it, with every template in use.
 #include <string>
 #include <tonewerk/reporting.hpp>
 #include <type_traits>

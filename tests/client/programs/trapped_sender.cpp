@@ -1,12 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A real-time thread that sends while everything it must not do is trapped. Prints "taken N dropped N" when
-// nothing was trapped and ends with status 0; else "trapped WHAT" and 1. Status 3 where the kernel does not
-// let system calls be trapped.
+// Runs a real-time thread that sends while all forbidden actions are trapped. Prints "taken N dropped N" and
+// ends with status 0 when nothing was trapped, otherwise prints "trapped WHAT" and ends with 1. Ends with 3
+// when the kernel does not allow system calls to be trapped.
 //
 //   trapped_sender ACTION [without-system-calls]
 //
-// ACTION is "send", or something that has to be trapped, which is done once among the sending.
+// ACTION is "send", or a forbidden action, which the thread does once between messages.
 
 #include <array>
 #include <cstdint>
@@ -35,7 +35,7 @@
 namespace {
 
 constexpr std::uint32_t kMessages = 100'000;
-constexpr std::size_t kRingBytes = 4096;  // runs full long before the background thread comes again
+constexpr std::size_t kRingBytes = 4096;  // is full long before the background thread reads it again
 constexpr int kPatienceMs = 30'000;
 
 // Exit statuses.
@@ -44,10 +44,10 @@ constexpr int kCannot = 2;
 constexpr int kNotPermitted = 3;
 constexpr int kMiscounted = 4;
 
-// Compilers may leave out an allocation whose result goes nowhere.
+// Keeps compilers from removing an allocation whose result is not used.
 void* volatile allocatedMemory = nullptr;
 
-// What the traps have to catch.
+// The actions that the traps must catch.
 const std::map<std::string, std::function<void()>>& forbiddenActions() {
   static void* const memory = std::malloc(16);
   static std::mutex mutex;
@@ -76,7 +76,7 @@ const std::map<std::string, std::function<void()>>& forbiddenActions() {
   return all;
 }
 
-// Who reads what the client sends, and throws it away until the client hangs up.
+// Reads and drops the client's bytes until the client closes the connection.
 class Reader {
  public:
   explicit Reader(const std::string& path) : listener_(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0)) {
@@ -108,12 +108,12 @@ struct Run {
   twr_sender* sender = nullptr;
   const std::function<void()>* forbiddenAction = nullptr;
   bool forbidsSystemCalls = true;
-  int problem = 0;  // why they cannot be
+  int problem = 0;  // the errno when they cannot be forbidden
   std::uint64_t sent = 0;
   std::uint64_t dropped = 0;
 };
 
-// Every function that builds, one failure, and the sender's answer to each, whatever it is.
+// Calls every function that builds a payload, makes one of them fail, and sends the payload.
 void sendOne(Run& run, std::uint32_t number) {
   unsigned char memory[256];
   twr_payload payload;
@@ -152,21 +152,21 @@ void* sendAll(void* given) {
   return nullptr;
 }
 
-// What the traps have to say; none for nothing.
+// The action that was trapped; none when there was none.
 std::string trapped() {
   if (traps_function() != nullptr) return traps_function();
   if (traps_system_call() >= 0) return "system call " + std::to_string(traps_system_call());
   return {};
 }
 
-// Whether everything that was taken has gone out, and every loss is counted.
+// True when every message that was taken was sent, and every loss is counted.
 bool isAccountedFor(const Run& run, twr_client* client) {
   twr_client_info info{};
   info.size = sizeof(info);
   if (twr_client_flush(client, kPatienceMs) != TWR_OK || twr_client_get_info(client, &info) != TWR_OK) {
     return false;
   }
-  // One more that says what no later message carried.
+  // One more message may report losses that no later message has reported.
   const bool isSent = info.messages_sent == run.sent || info.messages_sent == run.sent + 1;
   return isSent && info.messages_dropped == run.dropped && run.sent + run.dropped == kMessages;
 }

@@ -16,7 +16,7 @@
 
 namespace tonewerk {
 
-// twctl with directories and a socket of its own.
+// Runs twctl with its own directories and socket.
 class CommandLineTest : public testing::Test {
  protected:
   CommandLineTest() {
@@ -31,7 +31,7 @@ class CommandLineTest : public testing::Test {
       unsetenv(name);
   }
 
-  // The exit status; what was printed is in output() and errors().
+  // Returns the exit status. output() and errors() return what was printed.
   int run(const std::vector<std::string>& arguments) {
     std::vector<const char*> argv{"twctl"};
     for (const std::string& argument : arguments) argv.push_back(argument.c_str());

@@ -92,7 +92,7 @@ TEST_F(CommandLineTest, CallsWrongUsageWrong) {
   }
 }
 
-// "--watch: --watch:" it said, and of a command that there is not that one is required.
+// It printed "--watch: --watch:", and for an unknown command that a command is required.
 TEST_F(CommandLineTest, SaysInOneLineWhatIsWrong) {
   const std::vector<std::pair<std::vector<std::string>, std::string>> wrong{
       {{}, "a command is required; see twctl --help"},
@@ -139,7 +139,7 @@ TEST_F(CommandLineTest, SaysInOneLineWhatIsWrong) {
   }
 }
 
-TEST_F(CommandLineTest, SaysWhereThingsAre) {
+TEST_F(CommandLineTest, PrintsPaths) {
   EXPECT_EQ(run({"paths", "store"}), kDone);
   EXPECT_EQ(output(), directory_.path("state/reports.db") + "\n");
   EXPECT_EQ(run({"paths", "socket"}), kDone);
@@ -171,7 +171,7 @@ TEST_F(CommandLineTest, SaysWhereNoDaemonListens) {
   }
 }
 
-// The reason of the place that was looked at last said that there is no file.
+// The error printed was that of the last path, where there is no file.
 TEST_F(CommandLineTest, SaysThatADaemonHasLeftItsSocket) {
   unsetenv("TONEWERK_REPORTING_SOCKET");
   std::filesystem::create_directory(directory_.path("runtime"));
@@ -205,7 +205,7 @@ TEST_F(CommandLineTest, ValidatesAnIdentifier) {
   EXPECT_EQ(output(), "{\"reporterID\":-7,\"serviceType\":65535,\"serviceName\":\"unknown\"}\n");
 }
 
-TEST_F(CommandLineTest, RefusesAnIdentifierThatNobodyHas) {
+TEST_F(CommandLineTest, RefusesAnIdentifierOfNoSession) {
   daemon().answer("reporterIDValid", ValueMap{{"reporterID", 0}, {"serviceType", 65535}});
   EXPECT_EQ(run({"validate", "7"}), kRefused);
   EXPECT_THAT(errors(), HasSubstr("no session has the identifier 7"));
@@ -225,8 +225,8 @@ TEST_F(CommandLineTest, SendsAMessageToTheSessionsNamed) {
   EXPECT_EQ(arguments[3], Value(ValueArray{7, -8}));
 }
 
-// The daemon passes over identifiers that nobody has, and answers as if all were well.
-TEST_F(CommandLineTest, SendsToNobodyWhenAnIdentifierIsNobodys) {
+// The daemon ignores identifiers of no session, and answers as if the message was delivered.
+TEST_F(CommandLineTest, SendsNothingWhenAnIdentifierIsOfNoSession) {
   daemon().setSessions({7});
   EXPECT_EQ(run({"send", "--id", "8", "--category", "4", "--type", "1", "a=1"}), kRefused);
   EXPECT_EQ(errors(), "twctl: no session has the identifier 8; the message was sent to none\n");
@@ -236,7 +236,7 @@ TEST_F(CommandLineTest, SendsToNobodyWhenAnIdentifierIsNobodys) {
   EXPECT_THAT(daemon().requestsFor("sendMessage"), IsEmpty());
 }
 
-TEST_F(CommandLineTest, WhoOnlyLooksSaysSoAndWhoChangesSomethingDoesNot) {
+TEST_F(CommandLineTest, OnlyReadingCommandsConnectAsOnlookers) {
   daemon().setSessions({7});
   daemon().answer("getAllReporters", ValueArray{7});
   const std::string recording =
@@ -255,7 +255,7 @@ TEST_F(CommandLineTest, WhoOnlyLooksSaysSoAndWhoChangesSomethingDoesNot) {
   EXPECT_THAT(daemon().requestsFor("observe"), SizeIs(2));
 }
 
-TEST_F(CommandLineTest, LooksAtADaemonThatDoesNotKnowOnlookers) {
+TEST_F(CommandLineTest, ReadsFromADaemonThatDoesNotKnowOnlookers) {
   daemon().refuse("observe", messagingError(kUnknownMethod, "there is no method observe"));
   daemon().setSessions({7});
   EXPECT_EQ(run({"validate", "7"}), kDone);
@@ -363,7 +363,7 @@ TEST_F(CommandLineTest, PlaysTheExamples) {
   }
 }
 
-// With a store that holds three events.
+// Runs twctl with a store that has three events.
 class EventsCommandTest : public CommandLineTest {
  protected:
   void store() {
@@ -408,8 +408,8 @@ TEST_F(EventsCommandTest, TakesTimes) {
             "{\"id\":4,\"recorded_at\":1763633890.5,\"name\":\"com.orvane.b\",\"payload\":{\"n\":2}}\n");
 }
 
-// With a store that holds a power event and three metric records, the second of a kind that nobody knows and
-// the third damaged.
+// Runs twctl with a store that has a power event and three metric records. The second is of an unknown kind,
+// and the third is damaged.
 class MetricsCommandTest : public CommandLineTest {
  protected:
   void store() {
@@ -459,8 +459,8 @@ TEST_F(MetricsCommandTest, TheLimitTakesTheNewest) {
   EXPECT_THAT(output(), HasSubstr("{\"id\":3,"));
 }
 
-// With a store that holds an event of another table and six power events, those with a duration on the odd
-// seconds.
+// Runs twctl with a store that has an event of another table and six power events. Those on odd seconds have
+// a duration.
 class PowerCommandTest : public CommandLineTest {
  protected:
   void store() {

@@ -20,8 +20,8 @@
 
 namespace tonewerk {
 
-// A daemon with the real request set on a real socket, whose answers a test says beforehand. Requests without
-// a scripted answer are answered with true, a start and the kill request with nothing.
+// Runs a daemon with the real request set on a real socket. A test sets the answers in advance. Requests
+// without a set answer are answered with true; a start and the kill request are not answered.
 class ScriptedDaemon {
  public:
   struct Request {
@@ -43,9 +43,9 @@ class ScriptedDaemon {
     ender_.join();
   }
 
-  // Before the first request.
+  // To be called before the first request.
   void answer(const std::string& method, Value result) { results_[method] = std::move(result); }
-  // Has sessions of these identifiers, and no others, of the service type 2.
+  // Makes the daemon have exactly the sessions with these identifiers, all of the service type 2.
   void setSessions(std::set<std::int64_t> identifiers) { sessions_ = std::move(identifiers); }
   void refuse(const std::string& method, ReplyError error) { errors_[method] = std::move(error); }
 
@@ -91,7 +91,7 @@ class ScriptedDaemon {
     ending_.notifyOne();
   }
 
-  // The listener cannot be ended on its own thread, where the kill request arrives.
+  // The kill request arrives on the listener's thread, which cannot shut down the listener.
   void waitForTheEnd() {
     {
       MutexLock lock(mutex_);

@@ -17,7 +17,7 @@ namespace {
 using testing::HasSubstr;
 using testing::IsEmpty;
 
-// What the machine's own sound cards say is left out by the driver's name.
+// The driver's name leaves out the machine's own sound cards.
 class ChannelsCommandTest : public testing::Test {
  protected:
   ChannelsCommandTest() {
@@ -86,11 +86,11 @@ TEST_F(ChannelsCommandTest, RefusesIntervalsThatAreNone) {
   EXPECT_EQ(run({"channels", "--watch", "1", "2"}), kWrongUsage);
 }
 
-// An output that is closed ends it.
+// The command ends when its output is closed.
 TEST_F(ChannelsCommandTest, TakesAnIntervalOrNone) {
   for (const std::vector<const char*>& arguments : std::vector<std::vector<const char*>>{
            {"channels", "--watch"}, {"channels", "--watch", "2.5"}, {"channels", "--watch", "--json"}}) {
-    out_.setstate(std::ios::badbit);  // which ends it
+    out_.setstate(std::ios::badbit);  // which ends the command
     EXPECT_EQ(run(arguments), kRefused);
     out_.clear();
     EXPECT_EQ(err_.str(), "twctl: cannot write the output\n");

@@ -18,7 +18,7 @@ class DefaultsCommandTest : public CommandLineTest {
     std::filesystem::create_directories(directory_.path("configuration/preferences"));
     write("configuration/preferences/" + domain + ".toml", text);
   }
-  // Writes a value that is refused for a reason, and finds that nothing has changed.
+  // Writes a value that must be refused for this reason, and checks that nothing has changed.
   void expectRefused(const std::string& domain, const std::string& key, const std::string& value,
                      const std::string& problem) {
     SCOPED_TRACE(key + " = " + value);
@@ -100,7 +100,7 @@ TEST_F(DefaultsCommandTest, RefusesWhatTheKeyCannotBe) {
                 "memory_tools must be an array of two texts, not [\"free\"]");
 }
 
-// As the daemon finds it, which would leave them out and say so in its log alone.
+// The daemon would ignore these entries, and only log it.
 TEST_F(DefaultsCommandTest, RefusesEntriesThatTheDaemonWouldLeaveOut) {
   EXPECT_EQ(
       run({"defaults", "write", "com.orvane.linkreport", "backends", R"(["local", "ftp://a.example"])"}),
@@ -185,7 +185,7 @@ class AnnouncedDefaultsTest : public CommandLineTest {
   }
 };
 
-TEST_F(AnnouncedDefaultsTest, TellsTheDaemonOfWhatItFollows) {
+TEST_F(AnnouncedDefaultsTest, NotifiesTheDaemonOfWatchedPreferences) {
   EXPECT_EQ(run({"defaults", "write", "com.orvane.tonewerk", "device_name", "Kitchen"}), kDone);
   EXPECT_THAT(posted(), testing::ElementsAre("com.orvane.tonewerk.reporting"));
   EXPECT_EQ(run({"defaults", "delete", "com.orvane.tonewerk", "device_name"}), kDone);
@@ -194,7 +194,7 @@ TEST_F(AnnouncedDefaultsTest, TellsTheDaemonOfWhatItFollows) {
   EXPECT_THAT(posted(), testing::ElementsAre("com.orvane.homedeck.spatial-audio-accessory-feature.changed"));
 }
 
-TEST_F(AnnouncedDefaultsTest, TellsNobodyOfWhatNobodyFollowsOrDidNotChange) {
+TEST_F(AnnouncedDefaultsTest, NotifiesOnlyOfChangedPreferencesThatAreWatched) {
   EXPECT_EQ(run({"defaults", "write", "com.orvane.homedeck", "device_name", "1"}), kDone);
   EXPECT_EQ(run({"defaults", "write", "com.orvane.metricon", "device_name", "1"}), kDone);
   EXPECT_EQ(run({"defaults", "read", "com.orvane.homedeck"}), kDone);
@@ -202,14 +202,14 @@ TEST_F(AnnouncedDefaultsTest, TellsNobodyOfWhatNobodyFollowsOrDidNotChange) {
   EXPECT_THAT(posted(), IsEmpty());
 }
 
-TEST_F(AnnouncedDefaultsTest, WithoutARuntimeDirectoryThereIsNobodyToTell) {
+TEST_F(AnnouncedDefaultsTest, NotifiesNothingWithoutARuntimeDirectory) {
   std::filesystem::remove(directory_.path("runtime"));
   EXPECT_EQ(run({"defaults", "write", "com.orvane.tonewerk", "device_name", "Kitchen"}), kDone);
   EXPECT_THAT(errors(), IsEmpty());
   EXPECT_FALSE(std::filesystem::exists(directory_.path("runtime")));
 }
 
-TEST_F(AnnouncedDefaultsTest, AChangeThatCannotBeToldHoldsAndSaysSo) {
+TEST_F(AnnouncedDefaultsTest, KeepsAChangeThatCannotBeNotifiedAndWarns) {
   write("runtime/notifications", "a file in the way");
   EXPECT_EQ(run({"defaults", "write", "com.orvane.tonewerk", "device_name", "Kitchen"}), kDone);
   EXPECT_THAT(errors(), HasSubstr("a running daemon is not told of it: com.orvane.tonewerk.reporting: "));

@@ -29,7 +29,7 @@ constexpr const char* kCaptureRequest =
   "requestedAt": "2026-11-20T10:18:00Z", "collected": ["load.txt"],
   "problems": {"pipewire.json": "pw-dump: ended with status 1"}})";
 
-// twctl with a state directory of its own.
+// Runs twctl with its own state directory.
 class DiagnosticsCommandTest : public testing::Test {
  protected:
   DiagnosticsCommandTest() { setenv("STATE_DIRECTORY", directory.path("state").c_str(), 1); }
@@ -190,7 +190,7 @@ TEST_F(DiagnosticsCommandTest, NoNameLeavesTheDirectory) {
   EXPECT_TRUE(items.contains(DiagnosticKind::kCapture, "one"));
 }
 
-TEST_F(DiagnosticsCommandTest, WantsToKnowWhich) {
+TEST_F(DiagnosticsCommandTest, RequiresAnIdentifier) {
   EXPECT_EQ(run({"captures", "show"}), kWrongUsage);
   EXPECT_EQ(run({"captures", "show", "one", "--latest"}), kWrongUsage);
   EXPECT_EQ(run({"captures", "show", "one", "two"}), kWrongUsage);
@@ -219,7 +219,7 @@ TEST(DiagnosticSummaryTest, LetsNothingMoveTheCursor) {
   EXPECT_EQ(summary->payload, "{\"?\":1}");
 }
 
-TEST(DiagnosticSummaryTest, TakesWhateverIsThere) {
+TEST(DiagnosticSummaryTest, ReadsTheFieldsThatExist) {
   EXPECT_FALSE(DiagnosticSummary::read(DiagnosticKind::kCapture, "[]"));
   EXPECT_FALSE(DiagnosticSummary::read(DiagnosticKind::kCapture, ""));
   const auto summary = DiagnosticSummary::read(

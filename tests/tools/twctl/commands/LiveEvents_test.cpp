@@ -52,7 +52,7 @@ TEST(LiveEventsTest, TellsOfEachKey) {
   EXPECT_EQ(events.key(), 'q');
 }
 
-TEST(LiveEventsTest, GoesOnWithoutKeysOnceThereCanBeNone) {
+TEST(LiveEventsTest, ContinuesWithoutKeysAfterTheEndOfTheInput) {
   Pipe keys;
   LiveEvents events(keys.reading.get(), -1);
   keys.writing.reset();
@@ -69,7 +69,7 @@ TEST(LiveEventsTest, IsStoppedForGoodByASignal) {
   }
 }
 
-TEST(LiveEventsTest, IsStoppedWhenNobodyReadsTheOutput) {
+TEST(LiveEventsTest, IsStoppedWhenTheOutputsReaderHasClosedIt) {
   Pipe output;
   LiveEvents events(-1, output.writing.get());
   EXPECT_EQ(events.wait(-1, now()), Event::kTime);
@@ -86,7 +86,7 @@ TEST(LiveEventsTest, TellsEachTimeThatTheWindowHasAnotherSize) {
   EXPECT_EQ(events.wait(-1, now()), Event::kTime);
 }
 
-TEST(LiveEventsTest, LetsTheSecondSignalDoWhatItAlwaysDid) {
+TEST(LiveEventsTest, LetsTheSecondSignalEndTheProcess) {
   EXPECT_EXIT(
       {
         const LiveEvents events(-1, -1);
@@ -96,7 +96,7 @@ TEST(LiveEventsTest, LetsTheSecondSignalDoWhatItAlwaysDid) {
       testing::KilledBySignal(SIGTERM), "");
 }
 
-TEST(LiveEventsTest, GivesSignalsBack) {
+TEST(LiveEventsTest, RestoresSignalHandlers) {
   static volatile std::sig_atomic_t count = 0;
   const auto before = std::signal(SIGINT, [](int) { count = count + 1; });
   { const LiveEvents events(-1, -1); }

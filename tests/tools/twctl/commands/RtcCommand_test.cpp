@@ -21,7 +21,7 @@ using testing::HasSubstr;
 using testing::IsEmpty;
 using testing::Not;
 
-// With a store that holds two sessions of a message each.
+// Runs twctl with a store that has two sessions with one message each.
 class RtcCommandTest : public testing::Test {
  protected:
   RtcCommandTest() { setenv("STATE_DIRECTORY", directory_.path("state").c_str(), 1); }

@@ -10,7 +10,7 @@ namespace {
 using testing::ElementsAre;
 using testing::SizeIs;
 
-// A screen on which time passes, and things happen, as a test has said beforehand; then somebody quits.
+// A screen whose times and events a test sets in advance. After the last one the user quits.
 class ScriptedScreen final : public LiveScreen {
  public:
   TerminalSize size() const override { return size_; }
@@ -36,7 +36,7 @@ using Event = LiveScreen::Event;
 
 class TopLoopTest : public testing::Test {
  protected:
-  // One more listing each time, with five messages more.
+  // Returns another listing at each call, with five more messages.
   SessionSource source = [this]() -> std::optional<std::vector<ValueMap>> {
     if (++listings > most) return std::nullopt;
     return std::vector<ValueMap>(2, ValueMap{{"reporterID", 7}, {"messages", 5 * listings}});
@@ -46,7 +46,7 @@ class TopLoopTest : public testing::Test {
   ScriptedScreen screen;
 };
 
-TEST_F(TopLoopTest, ShowsAPageAndEndsWhenSomebodyQuits) {
+TEST_F(TopLoopTest, ShowsAPageAndEndsWhenTheUserQuits) {
   runTop(source, screen, 1);
   EXPECT_THAT(screen.pages, SizeIs(1));
   EXPECT_EQ(screen.pages.at(0).at(0), "2 sessions");
@@ -59,7 +59,7 @@ TEST_F(TopLoopTest, MeasuresOverTheInterval) {
   EXPECT_EQ(screen.pages[1].at(0), "2 sessions, 5.0 messages a second");
 }
 
-TEST_F(TopLoopTest, ANewWindowSizeShowsTheSamePageAnew) {
+TEST_F(TopLoopTest, ShowsTheSamePageAgainInANewWindowSize) {
   screen.events = {Event::kResized};
   runTop(source, screen, 1);
   EXPECT_EQ(listings, 1);

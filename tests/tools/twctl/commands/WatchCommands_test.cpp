@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// twctl top and twctl tail, beside a daemon whose answers are said beforehand.
+// Tests twctl top and twctl tail with a scripted daemon.
 #include <gmock/gmock.h>
 #include <memory>
 #include <sstream>
@@ -35,7 +35,7 @@ class WatchCommandsTest : public testing::Test {
     Tool tool{out, err, json};
     return runCommandLine(static_cast<int>(arguments.size()), arguments.data(), tool);
   }
-  // Says that there are so many sessions, and of each what it does.
+  // Makes the answer with the total number of sessions and these sessions.
   void answerSessions(std::vector<Value> sessions) {
     const std::size_t count = sessions.size();
     daemon.answer("watch.sessions",
@@ -80,7 +80,7 @@ TEST_F(WatchCommandsTest, TopPrintsOneFrameWhereThereIsNoTerminal) {
   EXPECT_THAT(daemon.requestsFor("watch.sessions"), SizeIs(2));
 }
 
-TEST_F(WatchCommandsTest, WhoWatchesSaysFirstThatItOnlyLooksOn) {
+TEST_F(WatchCommandsTest, ConnectsAsAnOnlookerFirst) {
   answerSessions({});
   answerMessages(0, {message(1)});
   for (const std::vector<const char*>& command :

@@ -12,10 +12,10 @@ const std::vector<std::string> kNames{"list", "events", "metrics", "HAL_Playback
 
 TEST(SuggestionTest, IsTheNameThatTakesTheFewestChanges) {
   EXPECT_EQ(closestTo("lst", kNames), "list");                  // a letter is missing
-  EXPECT_EQ(closestTo("eventss", kNames), "events");            // one too many
-  EXPECT_EQ(closestTo("mwtrics", kNames), "metrics");           // another one
-  EXPECT_EQ(closestTo("lsit", kNames), "list");                 // two exchanged
-  EXPECT_EQ(closestTo("event", {"events", "vent"}), "events");  // the first of two that are as close
+  EXPECT_EQ(closestTo("eventss", kNames), "events");            // a letter too many
+  EXPECT_EQ(closestTo("mwtrics", kNames), "metrics");           // a wrong letter
+  EXPECT_EQ(closestTo("lsit", kNames), "list");                 // two swapped
+  EXPECT_EQ(closestTo("event", {"events", "vent"}), "events");  // the first of two equally close
 }
 
 TEST(SuggestionTest, TakesUpperAndLowerCaseForTheSame) {

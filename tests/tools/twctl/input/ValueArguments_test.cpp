@@ -54,7 +54,7 @@ TEST(ValueArgumentsTest, KnowsTypes) {
   for (const char* text : {"", "start", "65536", "-1", "1.0"}) EXPECT_FALSE(typeOfArgument(text)) << text;
 }
 
-// One above the largest was taken for the largest, and somebody else's session answered for.
+// The largest identifier plus one was read as the largest, and the answer was about another session.
 TEST(ValueArgumentsTest, RefusesAnIdentifierOutOfRange) {
   for (const char* good : {"0", "7", "-1", "9223372036854775807", "-9223372036854775808"}) {
     EXPECT_EQ(problemWithReporterID(good), "");

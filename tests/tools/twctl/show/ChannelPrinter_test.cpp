@@ -146,7 +146,7 @@ TEST_F(ChannelPrinterTest, ClearsATerminalBeforeEachBlock) {
   EXPECT_THAT(changes(), StartsWith("\x1b[H\x1b[2J2025"));
 }
 
-TEST_F(ChannelPrinterTest, GoesOnWhereItWasWhenNothingCouldBeRead) {
+TEST_F(ChannelPrinterTest, ContinuesAfterAFailedRead) {
   chanmeter_.setRecords({simple(speaker("a"), 1)});
   changes();
   chanmeter_.fail(MemoryChanmeter::Operation::kCreateSamples, {.code = 5});

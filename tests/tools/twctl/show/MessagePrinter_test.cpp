@@ -14,7 +14,7 @@ class MessagePrinterTest : public testing::Test {
  protected:
   MessagePrinterTest() { tool.asJson = false; }
 
-  // What is printed since the last time.
+  // Returns what was printed since the last call.
   std::string printed() {
     const std::string text = out.str();
     out.str({});

@@ -13,7 +13,7 @@ TEST(PrintableTextTest, PutsAQuestionMarkForEachControlCharacter) {
   EXPECT_EQ(printable(std::string("\0", 1)), "?");
 }
 
-TEST(PrintableTextTest, LeavesAllElse) {
+TEST(PrintableTextTest, LeavesOtherCharacters) {
   EXPECT_EQ(printable("Überlauf \xC2\xA0 \xE2\x82\xAC ~"), "Überlauf \xC2\xA0 \xE2\x82\xAC ~");
   EXPECT_EQ(printable("\xC2"), "\xC2");
   EXPECT_EQ(printable(""), "");
