@@ -1,4 +1,4 @@
-# What is made of tonewerk_reporting_objects: libtwreporting.so.0 and libtwreporting.a.
+# Makes libtwreporting.so.0 and libtwreporting.a of tonewerk_reporting_objects.
 set(twreporting_map ${CMAKE_CURRENT_LIST_DIR}/libtwreporting.map)
 add_library(twreporting SHARED $<TARGET_OBJECTS:tonewerk_reporting_objects>)
 set_target_properties(twreporting PROPERTIES
@@ -7,15 +7,15 @@ target_include_directories(twreporting INTERFACE ${PROJECT_SOURCE_DIR}/include)
 target_link_libraries(twreporting PRIVATE Threads::Threads)
 target_link_options(twreporting PRIVATE
   -Wl,--version-script=${twreporting_map} -Wl,-z,now -Wl,-Bsymbolic)
-# A sanitizer's own symbols are only there in the program.
+# A sanitizer's symbols are only in the program.
 if(NOT TONEWERK_SANITIZE)
   target_link_options(twreporting PRIVATE -Wl,-z,defs)
 endif()
 
-# One object, so that it can keep its names to itself as the shared library does. Groups that other objects of a program
-# may hold, too (inlined functions), become plain sections first: one that was thrown out for another's would leave
-# nothing behind for names that are local.
-# That option is GNU ld's alone, while CMake's own choice beside clang is another linker where there is one.
+# The archive has one object, so that its names can be local, as in the shared library. Section groups that
+# other objects of a program may also contain (inlined functions) become plain sections first. Otherwise the
+# linker could discard ours for another object's, which the local names cannot refer to.
+# Only GNU ld has that option, and CMake may choose another linker for clang.
 find_program(TWREPORTING_LD NAMES ld.bfd ld REQUIRED)
 set(twreporting_archive ${CMAKE_CURRENT_BINARY_DIR}/libtwreporting.a)
 set(twreporting_object ${CMAKE_CURRENT_BINARY_DIR}/twreporting.o)

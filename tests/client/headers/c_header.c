@@ -1,5 +1,5 @@
 /* SPDX-License-Identifier: Apache-2.0 */
-/* Compiled as C11, as C++98 and as C++20: the C interface as strangers include it, and all that is in it. */
+/* Compiled as C11, as C++98 and as C++20: includes the C interface as programs do, and uses all of it. */
 /* NOLINTBEGIN(modernize-*) */
 #include <tonewerk/reporting.h>
 

@@ -113,7 +113,7 @@ struct Run {
   std::uint64_t dropped = 0;
 };
 
-// Calls every function that builds a payload, makes one of them fail, and sends the payload.
+// Calls every function that builds a payload, and sends it. One of them fails for every 1000th payload.
 void sendOne(Run& run, std::uint32_t number) {
   unsigned char memory[256];
   twr_payload payload;

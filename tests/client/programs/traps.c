@@ -25,7 +25,7 @@ static void notice(const char* function) {
   if (has_traps) atomic_compare_exchange_strong(&first_function, &none, function);
 }
 
-/* ---- allocation: the C library has its own under second names. operator new and delete call these. ---- */
+/* ---- allocation: the C library has second names for its functions. operator new and delete call these. ---- */
 
 extern void* __libc_malloc(size_t size);
 extern void* __libc_calloc(size_t count, size_t size);
@@ -71,8 +71,8 @@ void free(void* memory) {
 
 /* ---- locks ---- */
 
-/* Notes the call and passes it on. The union, since no pointer to an object becomes one to a function in C.
- */
+/* Notes the call and passes it on. The union converts the pointer, because C does not convert a pointer to an
+ * object into one to a function. */
 #define TRAP(name, parameters, arguments)    \
   int name parameters {                      \
     static _Atomic(void*) known;             \
@@ -121,7 +121,7 @@ TRAP(sem_post, (sem_t * semaphore), (semaphore))
 
 /* ---- system calls ---- */
 
-/* On the thread that made the call, which then goes on as if the call had failed. */
+/* Runs on the thread that made the call, which then continues as if the call had failed. */
 static void on_system_call(int signal, siginfo_t* information, void* context) {
   int none = -1;
   (void)signal;
@@ -138,7 +138,7 @@ void traps_prepare(void) {
 }
 
 int traps_forbid_system_calls(void) {
-  /* The end of the thread and of the signal's handler may pass. Of one architecture: the one compiled for. */
+  /* Allows the system calls that end the thread and return from a signal handler. */
   struct sock_filter filter[] = {
       BPF_STMT(BPF_LD | BPF_W | BPF_ABS, offsetof(struct seccomp_data, nr)),
       BPF_JUMP(BPF_JMP | BPF_JEQ | BPF_K, SYS_exit, 2, 0),

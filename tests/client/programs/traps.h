@@ -3,29 +3,29 @@
 #define TONEWERK_TESTS_TRAPS_H
 
 /*
- * What a real-time thread must not do, made to be noticed: in a program that is linked with these, every
- * allocation and every lock of a thread with traps is remembered, and so is every system call where the
- * kernel allows a thread to be watched. The thread goes on; what it did is told afterwards.
+ * Traps notice forbidden actions of a real-time thread. In a program that is linked with them, they record
+ * the first allocation or lock of a thread with traps, and its first system call if the kernel allows the
+ * thread to be watched. The thread continues, and the program asks for the records afterwards.
  *
- * Compile without sanitizers, which have the same functions for themselves.
+ * Compile without sanitizers, which replace the same functions.
  */
 
 #ifdef __cplusplus
 extern "C" {
 #endif
 
-/* Once, before the thread starts. */
+/* To be called once, before the thread starts. */
 void traps_prepare(void);
 
-/* From now on the calling thread may make no system call but that of traps_exit(), for good. 0, or the errno
- * with which the kernel refused. */
+/* From now on the calling thread may make no system call except that of traps_exit(). This cannot be undone.
+ * Returns 0, or the errno with which the kernel refused. */
 int traps_forbid_system_calls(void);
 
-/* Between the two, the calling thread may neither allocate nor lock. */
+/* Between these two calls, the calling thread must not allocate or lock. */
 void traps_begin(void);
 void traps_end(void);
 
-/* Ends the calling thread, which may be joined. Nothing of it is destroyed: that would take system calls. */
+/* Ends the calling thread, which may be joined. Its objects stay, because destroying them takes system calls. */
 void traps_exit(void);
 
 /* The first function that a thread called within its traps; NULL for none. */
