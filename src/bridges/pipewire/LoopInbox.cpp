@@ -9,7 +9,7 @@ LoopInbox::LoopInbox(EventLoop& loop)
     : source_(event_.open() ? loop.watch(event_.fileDescriptor(), [this] { runAll(); }) : nullptr) {}
 
 void LoopInbox::post(std::function<void()> work) {
-  const std::lock_guard lock(mutex_);
+  const MutexLock lock(mutex_);
   posted_.push_back(std::move(work));
   event_.signal();
 }
@@ -17,7 +17,7 @@ void LoopInbox::post(std::function<void()> work) {
 void LoopInbox::runAll() {
   std::vector<std::function<void()>> posted;
   {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     event_.clear();
     posted.swap(posted_);
   }

@@ -3,11 +3,11 @@
 
 #include <functional>
 #include <memory>
-#include <mutex>
 #include <vector>
 
 #include "bridges/pipewire/EventLoop.h"
 #include "platform/linux/descriptors/WakeEvent.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -31,8 +31,8 @@ class LoopInbox {
   void runAll();
 
   WakeEvent event_;
-  std::mutex mutex_;
-  std::vector<std::function<void()>> posted_;  // under mutex_
+  Mutex mutex_;
+  std::vector<std::function<void()>> posted_ GUARDED_BY(mutex_);
   std::unique_ptr<EventLoop::Source> source_;  // last: its callback uses the others
 };
 

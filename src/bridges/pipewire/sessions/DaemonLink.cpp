@@ -1,13 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "bridges/pipewire/sessions/DaemonLink.h"
 
-#include <condition_variable>
-#include <mutex>
 #include <optional>
 #include <system_error>
 #include <utility>
 
 #include "client/ValuePayload.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 namespace {
@@ -23,20 +22,23 @@ class Awaited {
     // Its own share, for who waits may have given up.
     const std::unique_ptr<std::shared_ptr<Awaited>> share(static_cast<std::shared_ptr<Awaited>*>(context));
     Awaited& self = **share;
-    const std::lock_guard lock(self.mutex_);
+    const MutexLock lock(self.mutex_);
     self.status_ = answer->status;
-    self.isAnswered_.notify_all();
+    self.isAnswered_.notifyAll();
   }
 
   bool waitForSuccess(milliseconds timeout) {
-    std::unique_lock lock(mutex_);
-    return isAnswered_.wait_for(lock, timeout, [this] { return status_.has_value(); }) && status_ == TWR_OK;
+    const auto deadline = std::chrono::steady_clock::now() + timeout;
+    MutexLock lock(mutex_);
+    while (!status_ && isAnswered_.waitUntil(lock, deadline)) {
+    }
+    return status_ == TWR_OK;
   }
 
  private:
-  std::mutex mutex_;
-  std::condition_variable isAnswered_;
-  std::optional<twr_status> status_;
+  Mutex mutex_;
+  Condition isAnswered_;
+  std::optional<twr_status> status_ GUARDED_BY(mutex_);
 };
 
 }  // namespace

@@ -2,10 +2,8 @@
 #pragma once
 
 #include <chrono>
-#include <condition_variable>
 #include <functional>
 #include <memory>
-#include <mutex>
 #include <optional>
 #include <string>
 #include <utility>
@@ -15,6 +13,7 @@
 #include "platform/linux/socket/UnixSocketListener.h"
 #include "protocol/Requests.h"
 #include "support/memory/MemoryLog.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -45,12 +44,12 @@ class RecordingDaemon final : private MessagingListenerDelegate {
 
   // From now on every request but getAllReporters is answered with this error.
   void refuse(ReplyError error) {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     refusal_ = std::move(error);
   }
 
   std::vector<Request> requests() const {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     return requests_;
   }
   std::vector<std::string> methods() const {
@@ -59,8 +58,11 @@ class RecordingDaemon final : private MessagingListenerDelegate {
     return methods;
   }
   bool waitForRequests(std::size_t count) const {
-    std::unique_lock lock(mutex_);
-    return changed_.wait_for(lock, std::chrono::seconds(30), [&] { return requests_.size() >= count; });
+    const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(30);
+    MutexLock lock(mutex_);
+    while (requests_.size() < count && changed_.waitUntil(lock, deadline)) {
+    }
+    return requests_.size() >= count;
   }
 
  private:
@@ -87,10 +89,10 @@ class RecordingDaemon final : private MessagingListenerDelegate {
     const std::string name(interface().methods[method].name);
     std::optional<ReplyError> refusal;
     {
-      const std::lock_guard lock(mutex_);
+      const MutexLock lock(mutex_);
       requests_.push_back({name, std::move(arguments)});
       if (name != "getAllReporters") refusal = refusal_;
-      changed_.notify_all();
+      changed_.notifyAll();
     }
     if (refusal) return reply(refusal);
     if (name != "startReportingSessionForID") reply(std::nullopt, Value(true));
@@ -98,10 +100,10 @@ class RecordingDaemon final : private MessagingListenerDelegate {
 
   MemoryLog log_;
   const LogCategory category_{log_, "com.orvane.tonewerk", "twrs"};
-  mutable std::mutex mutex_;
-  mutable std::condition_variable changed_;
-  std::vector<Request> requests_;      // under mutex_
-  std::optional<ReplyError> refusal_;  // under mutex_
+  mutable Mutex mutex_;
+  mutable Condition changed_;
+  std::vector<Request> requests_ GUARDED_BY(mutex_);
+  std::optional<ReplyError> refusal_ GUARDED_BY(mutex_);
   std::unique_ptr<UnixSocketListener> listener_;
 };
 
