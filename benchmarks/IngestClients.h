@@ -45,7 +45,7 @@ class IngestClients {
 
   void ask(Client& client, const std::string& bytes);
   void sendSome(Client& client, std::size_t messages, const Pace& pace);
-  bool write(Client& client);
+  [[nodiscard]] bool write(Client& client);
   void takeAnswers(Client& client);
 
   std::vector<Client> clients_;

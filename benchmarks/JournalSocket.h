@@ -17,7 +17,7 @@ struct JournalSocket {
   static constexpr const char* kPath = "/run/systemd/journal/socket";
 
   // Call it before there are threads. `problem` says why there is none.
-  static Kind prepare(std::string& problem);
+  [[nodiscard]] static Kind prepare(std::string& problem);
 };
 
 }  // namespace tonewerk

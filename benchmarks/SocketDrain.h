@@ -17,7 +17,7 @@ class SocketDrain {
   SocketDrain& operator=(const SocketDrain&) = delete;
   ~SocketDrain();
 
-  bool isRunning() const { return process_ > 0; }
+  [[nodiscard]] bool isRunning() const { return process_ > 0; }
 
  private:
   pid_t process_ = -1;

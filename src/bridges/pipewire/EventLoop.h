@@ -30,8 +30,8 @@ class EventLoop {
 
   // Runs `onReadable` as long as `descriptor` has something to read, or its peer is gone. The descriptor
   // stays the caller's, who closes it after destroying the result. Null when the system refuses.
-  virtual std::unique_ptr<Source> watch(int descriptor, std::function<void()> onReadable) = 0;
-  virtual std::unique_ptr<Timer> makeTimer(std::function<void()> onExpired) = 0;
+  [[nodiscard]] virtual std::unique_ptr<Source> watch(int descriptor, std::function<void()> onReadable) = 0;
+  [[nodiscard]] virtual std::unique_ptr<Timer> makeTimer(std::function<void()> onExpired) = 0;
 };
 
 }  // namespace tonewerk

@@ -22,7 +22,7 @@ class LoopInbox {
   ~LoopInbox() = default;
 
   // False when the system had no descriptor for it; nothing is then ever run.
-  bool isOpen() const { return source_ != nullptr; }
+  [[nodiscard]] bool isOpen() const { return source_ != nullptr; }
 
   // Any thread.
   void post(std::function<void()> work);

@@ -33,7 +33,7 @@ class DriverStatistics {
   ValueMap channelsOf(std::string_view driverName) const;
 
  private:
-  bool makeRoom(const std::set<DriverNode>& present);
+  [[nodiscard]] bool makeRoom(const std::set<DriverNode>& present);
 
   std::array<CycleStatistics, 2> totals_;  // by direction
   std::map<DriverNode, CycleStatistics> drivers_;

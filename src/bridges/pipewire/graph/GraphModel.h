@@ -53,7 +53,7 @@ class GraphModel {
   // The sinks and sources that drive others, by node.
   std::map<std::uint32_t, DriverNode> drivers() const;
   // None when the node is no such driver.
-  std::optional<DriverNode> driverAt(std::uint32_t node) const;
+  [[nodiscard]] std::optional<DriverNode> driverAt(std::uint32_t node) const;
   // Runs `onChange` whenever drivers() may differ, from inside the functions above.
   void watchDrivers(std::function<void()> onChange) { onDriversChanged_ = std::move(onChange); }
 

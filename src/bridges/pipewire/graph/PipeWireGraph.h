@@ -28,7 +28,7 @@ class PipeWireGraph {
   ~PipeWireGraph();
 
   // False when the library itself cannot be used (its configuration is missing): trying again would not help.
-  bool open();
+  [[nodiscard]] bool open();
 
  private:
   class Connection;

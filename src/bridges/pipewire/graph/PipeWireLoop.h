@@ -14,15 +14,15 @@ namespace tonewerk {
 class PipeWireLoop final : public EventLoop {
  public:
   // Null when the system refuses.
-  static std::unique_ptr<PipeWireLoop> make();
+  [[nodiscard]] static std::unique_ptr<PipeWireLoop> make();
   ~PipeWireLoop() override;
   PipeWireLoop(const PipeWireLoop&) = delete;
   PipeWireLoop& operator=(const PipeWireLoop&) = delete;
 
-  std::unique_ptr<Source> watch(int descriptor, std::function<void()> onReadable) override;
-  std::unique_ptr<Timer> makeTimer(std::function<void()> onExpired) override;
+  [[nodiscard]] std::unique_ptr<Source> watch(int descriptor, std::function<void()> onReadable) override;
+  [[nodiscard]] std::unique_ptr<Timer> makeTimer(std::function<void()> onExpired) override;
   // Takes the signal from the process: from now on it only runs `onSignal`. Null when the system refuses.
-  std::unique_ptr<Source> watchSignal(int signal, std::function<void()> onSignal);
+  [[nodiscard]] std::unique_ptr<Source> watchSignal(int signal, std::function<void()> onSignal);
 
   // Returns after quit(), which is called from a callback.
   void run();

@@ -16,6 +16,6 @@ namespace tonewerk {
 StreamVolume volumeOf(const spa_pod& properties);
 
 // None when it is no format of sound, or lacks rate or coding.
-std::optional<AudioFormat> formatOf(const spa_pod& format);
+[[nodiscard]] std::optional<AudioFormat> formatOf(const spa_pod& format);
 
 }  // namespace tonewerk

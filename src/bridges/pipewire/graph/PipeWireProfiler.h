@@ -20,7 +20,7 @@ class PipeWireProfiler {
  public:
   // Teaches the context the profiler's part of the protocol. Once, before any connection; false when the
   // library lacks it: a graph's profiler then cannot be found.
-  static bool teach(pw_context* context);
+  [[nodiscard]] static bool teach(pw_context* context);
 
   // Both outlive this.
   PipeWireProfiler(pw_registry* registry, ProfileObserver& observer);

@@ -37,13 +37,13 @@ class DaemonLink final : public SessionSink {
   ~DaemonLink() override;
 
   // Called once. `onConnected` must not destroy this. False without memory or descriptors.
-  bool open(std::function<void(Connection connection)> onConnected);
+  [[nodiscard]] bool open(std::function<void(Connection connection)> onConnected);
   bool isConnected() const { return isConnected_; }
   // Where the daemon is, or was last; empty before the first connection.
   std::string socketPath() const;
 
   // Waits, at most `timeout`, until the daemon has done what it was asked. False when it has not.
-  bool finish(std::chrono::milliseconds timeout);
+  [[nodiscard]] bool finish(std::chrono::milliseconds timeout);
 
   void create(std::int64_t reporterID) override;
   void configure(std::int64_t reporterID, std::uint16_t serviceType, const ValueMap& configuration) override;

@@ -16,9 +16,9 @@ class OverloadPacer {
 
   void add(const Overload& overload);
   // What is to be told now, if anything.
-  std::optional<Overload> take(std::chrono::nanoseconds now);
+  [[nodiscard]] std::optional<Overload> take(std::chrono::nanoseconds now);
   // Whatever there is, too early or not.
-  std::optional<Overload> takeRest();
+  [[nodiscard]] std::optional<Overload> takeRest();
   // When take() will have something; none when nothing is held.
   std::optional<std::chrono::nanoseconds> deadline() const;
   void clear() { held_.reset(); }

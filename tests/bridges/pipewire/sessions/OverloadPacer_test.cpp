@@ -24,7 +24,7 @@ TEST(OverloadPacer, LetsTheFirstPassAtOnce) {
 TEST(OverloadPacer, GathersWhatFollowsIntoOneForEachSecond) {
   OverloadPacer pacer;
   pacer.add(kFirst);
-  pacer.take(milliseconds(500));
+  EXPECT_EQ(pacer.take(milliseconds(500)), kFirst);
   pacer.add(kSecond);
   pacer.add(kThird);
   EXPECT_EQ(pacer.deadline(), milliseconds(1500));
@@ -36,7 +36,7 @@ TEST(OverloadPacer, GathersWhatFollowsIntoOneForEachSecond) {
 TEST(OverloadPacer, LetsPassAtOnceAgainWhatComesLater) {
   OverloadPacer pacer;
   pacer.add(kFirst);
-  pacer.take(milliseconds(0));
+  EXPECT_EQ(pacer.take(milliseconds(0)), kFirst);
   pacer.add(kSecond);
   EXPECT_EQ(pacer.take(milliseconds(1000)), kSecond);
 }
@@ -45,7 +45,7 @@ TEST(OverloadPacer, GivesTheRestWhenAsked) {
   OverloadPacer pacer;
   EXPECT_EQ(pacer.takeRest(), std::nullopt);
   pacer.add(kFirst);
-  pacer.take(milliseconds(0));
+  EXPECT_EQ(pacer.take(milliseconds(0)), kFirst);
   pacer.add(kSecond);
   EXPECT_EQ(pacer.takeRest(), kSecond);
   EXPECT_EQ(pacer.takeRest(), std::nullopt);

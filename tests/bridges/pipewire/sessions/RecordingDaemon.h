@@ -40,7 +40,7 @@ class RecordingDaemon final : private MessagingListenerDelegate {
     if (listener_ != nullptr) listener_->shutDown();
   }
 
-  bool isListening() const { return listener_ != nullptr; }
+  [[nodiscard]] bool isListening() const { return listener_ != nullptr; }
 
   // From now on every request but getAllReporters is answered with this error.
   void refuse(ReplyError error) {
@@ -57,7 +57,7 @@ class RecordingDaemon final : private MessagingListenerDelegate {
     for (const Request& request : requests()) methods.push_back(request.method);
     return methods;
   }
-  bool waitForRequests(std::size_t count) const {
+  [[nodiscard]] bool waitForRequests(std::size_t count) const {
     const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(30);
     MutexLock lock(mutex_);
     while (requests_.size() < count && changed_.waitUntil(lock, deadline)) {
