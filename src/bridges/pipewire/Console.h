@@ -6,15 +6,15 @@
 
 namespace tonewerk {
 
-// What the bridge tells the person who runs it: lines on standard error.
+// Writes lines to standard error for the person who runs the bridge.
 class Console {
  public:
-  // `out` outlives this.
+  // `out` outlives this object.
   explicit Console(bool verbose, std::FILE* out = stderr) : verbose_(verbose), out_(out) {}
 
-  // What anybody should know: a peer that came or went, a request that was refused.
+  // Writes an important event: a daemon has come or gone, a request was refused.
   void say(std::string_view line) const;
-  // What happens, step by step; shown when verbose.
+  // Writes a detail; only when verbose.
   void detail(std::string_view line) const;
   bool isVerbose() const { return verbose_; }
 

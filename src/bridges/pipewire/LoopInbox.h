@@ -11,17 +11,17 @@
 
 namespace tonewerk {
 
-// What other threads leave for the loop's thread to run, in the order in which they left it.
+// Runs work of other threads on the loop's thread, in the order in which it was posted.
 class LoopInbox {
  public:
-  // `loop` outlives this.
+  // `loop` outlives this object.
   explicit LoopInbox(EventLoop& loop);
   LoopInbox(const LoopInbox&) = delete;
   LoopInbox& operator=(const LoopInbox&) = delete;
-  // What was not run yet never is.
+  // Work that has not run yet is dropped.
   ~LoopInbox() = default;
 
-  // False when the system had no descriptor for it; nothing is then ever run.
+  // False when the system had no descriptor for it: posted work then never runs.
   [[nodiscard]] bool isOpen() const { return source_ != nullptr; }
 
   // Any thread.
@@ -33,7 +33,7 @@ class LoopInbox {
   WakeEvent event_;
   Mutex mutex_;
   std::vector<std::function<void()>> posted_ GUARDED_BY(mutex_);
-  std::unique_ptr<EventLoop::Source> source_;  // last: its callback uses the others
+  std::unique_ptr<EventLoop::Source> source_;  // last, because its callback uses the others
 };
 
 }  // namespace tonewerk

@@ -4,8 +4,7 @@
 #include <cstdint>
 #include <string_view>
 
-// The words of the reporting protocol that this bridge speaks: a client knows them as numbers and texts on
-// the wire.
+// The numbers and keys of the reporting protocol that this bridge sends.
 namespace tonewerk {
 
 namespace service {
@@ -41,7 +40,7 @@ inline constexpr std::string_view kBufferFramesKey = "smallest_buffer_frame_size
 inline constexpr std::string_view kCycleKey = "io_cycle";
 inline constexpr std::string_view kXrunCountKey = "xrun_count";
 
-// An issue that the daemon counts in its summary of a session.
+// Value of kIssueTypeKey. The daemon counts these messages in its summary of a session.
 inline constexpr std::string_view kOverloadIssue = "overload";
 
 }  // namespace tonewerk

@@ -19,8 +19,8 @@ namespace {
 
 constexpr int kWrongUsage = 2;
 
-// How long the daemon has, at the end, to take the last messages.
-constexpr std::chrono::milliseconds kLastWords{3000};
+// How long the bridge waits, before it ends, for the daemon to take the last messages.
+constexpr std::chrono::milliseconds kFinishTimeout{3000};
 
 int runBridge(const Console& console) {
   const std::unique_ptr<PipeWireLoop> loop = PipeWireLoop::make();
@@ -35,7 +35,7 @@ int runBridge(const Console& console) {
   const SystemClock clock;
   ReporterIdentifiers identifiers(clock, getpid());
   DaemonLink daemon(*loop, console);
-  // Users of one daemon publish beside each other.
+  // The bridges of several users may report to one daemon, so each publishes a file of its own.
   const std::string user = std::to_string(getuid());
   DriverStatistics statistics;
   ChannelPublisher publisher(*loop, clock, console, "tw-pipewire-" + user + ".json",
@@ -51,7 +51,7 @@ int runBridge(const Console& console) {
       if (connection == DaemonLink::Connection::kFirst) {
         reports.restartAll();
       } else {
-        reports.retellAll();
+        reports.resendAll();
       }
     };
     if (!daemon.open(onConnected)) {
@@ -64,10 +64,10 @@ int runBridge(const Console& console) {
     }
     loop->run();
   }
-  // Streams that still play are no longer watched: their sessions end here.
+  // The graph is no longer watched, so the sessions of streams that still play end here.
   model.clear();
-  if (daemon.isConnected() && !daemon.finish(kLastWords)) console.say("the daemon took not everything");
-  // Not before: the daemon reads them when a session stops.
+  if (daemon.isConnected() && !daemon.finish(kFinishTimeout)) console.say("the daemon took not everything");
+  // After finish(), because the daemon reads the channels when a session stops.
   publisher.withdraw();
   return 0;
 }
@@ -89,7 +89,7 @@ int main(int argc, char** argv) {
   try {
     app.parse(argc, argv);
   } catch (const CLI::ParseError& error) {
-    // --help and --version come here too, with 0.
+    // --help and --version also throw, with status 0.
     return app.exit(error) == 0 ? 0 : tonewerk::kWrongUsage;
   }
 

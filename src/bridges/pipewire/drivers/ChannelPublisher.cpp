@@ -54,12 +54,12 @@ void ChannelPublisher::write() {
   std::string text = NlohmannJsonService().compact(content_()) + "\n";
   if (text == written_) return;
   std::error_code error;
-  std::filesystem::create_directory(directory_, error);  // where it fails, so does what follows
+  std::filesystem::create_directory(directory_, error);  // if this fails, so does replaceFile()
   error = replaceFile(directory_, fileName_, text);
   if (!error) {
-    saidFailure_ = false;
+    hasReportedFailure_ = false;
     written_ = std::move(text);
-  } else if (!std::exchange(saidFailure_, true)) {
+  } else if (!std::exchange(hasReportedFailure_, true)) {
     console_.say("cannot publish driver channels in " + directory_ + " (" + error.message() + ")");
   }
 }

@@ -14,29 +14,31 @@
 
 namespace tonewerk {
 
-// Keeps a file of driver channels in the reporting daemon's runtime directory.
+// Writes a file of driver channels into the reporting daemon's runtime directory and keeps it up to date.
 //
-// Readers see a whole file, the old or the new one. It is rewritten when its content has changed, at most
-// once in kInterval, and whenever publish() asks for it. One that a dead process left behind is replaced by
-// the first writing. A file that cannot be written is said once, and tried again with the next change.
+// Readers always see a complete file, the old or the new one. The file is written again when its content has
+// changed: after changed() at most once in kInterval, after publish() at once. The first write replaces a
+// file that a dead process left behind. A failed write is reported once on the console and tried again with
+// the next change.
 //
-// For the loop's thread.
+// Used on the loop's thread only.
 class ChannelPublisher {
  public:
   static constexpr std::chrono::seconds kInterval{1};
 
   using Content = std::function<ValueMap()>;
 
-  // `content` says what the file is to hold. The others outlive this.
+  // `content` returns the file's content. The references outlive this object.
   ChannelPublisher(EventLoop& loop, const Clock& clock, const Console& console, std::string fileName,
                    Content content);
 
-  // The daemon is there, and keeps this runtime directory, which may have lost the file: publishes.
+  // Publishes in this runtime directory of a daemon that has just been connected; it may have lost the file.
   void open(const std::string& runtimeDirectory);
-  // The content may have changed. Nothing is written before open().
+  // Says that the content may have changed. Nothing is written before open().
   void changed();
+  // Writes the file now if its content has changed.
   void publish();
-  // Removes the file, and writes no more.
+  // Removes the file; nothing is written until the next open().
   void withdraw();
 
  private:
@@ -47,11 +49,11 @@ class ChannelPublisher {
   const std::string fileName_;
   const Content content_;
   std::string directory_;  // empty when not open
-  std::string written_;    // what the file holds; empty when that is not known
+  std::string written_;    // the file's content; empty when it is not known
   std::optional<std::chrono::nanoseconds> writtenAt_;
-  bool isDue_ = false;  // the timer runs
-  bool saidFailure_ = false;
-  std::unique_ptr<EventLoop::Timer> timer_;  // last: its callback uses the others
+  bool isDue_ = false;  // the timer is armed
+  bool hasReportedFailure_ = false;
+  std::unique_ptr<EventLoop::Timer> timer_;  // last, because its callback uses the others
 };
 
 }  // namespace tonewerk

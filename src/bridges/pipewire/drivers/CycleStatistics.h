@@ -11,12 +11,12 @@
 
 namespace tonewerk {
 
-// What a driver's cycles add up to, since the bridge began to look.
+// Adds up a driver's cycles since the bridge began to watch it.
 class CycleStatistics {
  public:
   void count(const ProfiledCycle& cycle, const CycleXruns& xruns);
 
-  // Appends one channel for each number, under `group` and, unless it is empty, `subgroup`.
+  // Appends one channel for each statistic, under `group` and, unless it is empty, `subgroup`.
   void describe(ValueArray& channels, std::string_view group, std::string_view subgroup) const;
 
  private:

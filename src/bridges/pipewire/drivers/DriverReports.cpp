@@ -12,8 +12,9 @@ namespace tonewerk {
 
 namespace {
 
-// Profiles come about a second late; a cycle that claims to be older has a clock that is not ours.
-constexpr std::chrono::nanoseconds kOldest = std::chrono::seconds(10);
+// Profiles arrive about a second late. A cycle older than this comes from a clock that is not the system's
+// monotonic one.
+constexpr std::chrono::nanoseconds kMaxAge = std::chrono::seconds(10);
 
 void addTo(std::map<std::uint32_t, Overload>& overloads, std::uint32_t stream, const Overload& overload) {
   const auto [entry, isNew] = overloads.try_emplace(stream, overload);
@@ -40,7 +41,7 @@ DriverReports::~DriverReports() {
 void DriverReports::profiled(const std::vector<ProfiledCycle>& cycles) {
   std::map<std::uint32_t, Overload> overloads;
   for (const ProfiledCycle& cycle : cycles) {
-    const CycleXruns xruns = xruns_.judge(cycle);
+    const CycleXruns xruns = xruns_.update(cycle);
     if (const std::optional<DriverNode> driver = model_.driverAt(cycle.driver)) {
       statistics_.count(*driver, cycle, xruns);
     }
@@ -62,7 +63,7 @@ void DriverReports::driversChanged() {
     present.insert(driver);
     nodes.insert(node);
   }
-  // The graph gives a node's number to another one later.
+  // The graph reuses the numbers of nodes that have left.
   xruns_.retain(nodes);
   statistics_.setPresent(present);
   publisher_.changed();
@@ -71,7 +72,7 @@ void DriverReports::driversChanged() {
 double DriverReports::wallTimeOf(const ProfiledCycle& cycle) const {
   const std::chrono::nanoseconds now = clock_.monotonic();
   const std::chrono::nanoseconds age = now - cycle.begin.value_or(now);
-  if (age < std::chrono::nanoseconds(0) || age > kOldest) return clock_.now();
+  if (age < std::chrono::nanoseconds(0) || age > kMaxAge) return clock_.now();
   return clock_.now() - std::chrono::duration<double>(age).count();
 }
 

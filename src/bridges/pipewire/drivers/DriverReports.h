@@ -13,13 +13,13 @@
 
 namespace tonewerk {
 
-// Adds up what the profiler tells of the graph's drivers, keeps the published channels in step, and tells
-// streams of their overloads: a stream of its own, and every stream that a driver serves of the driver's.
+// Adds up the profiler's data on the graph's drivers, keeps the published channels up to date, and reports
+// overloads to the streams. A stream gets its own overloads and those of the driver that serves it.
 //
-// For the loop's thread.
+// Used on the loop's thread only.
 class DriverReports final : public ProfileObserver {
  public:
-  // All outlive this, and `model` tells of its drivers no more when this is gone.
+  // All arguments outlive this object. It watches the drivers of `model` until it is destroyed.
   DriverReports(GraphModel& model, DriverStatistics& statistics, StreamReports& streams,
                 ChannelPublisher& publisher, const Clock& clock);
   DriverReports(const DriverReports&) = delete;

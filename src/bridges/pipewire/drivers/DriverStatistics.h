@@ -13,23 +13,23 @@
 
 namespace tonewerk {
 
-// The statistics of a graph's drivers, as channels of the reporting daemon's drivers: sinks under the group
-// "Tx", sources under "Rx", each under a subgroup of its name; and under no subgroup those of all sinks and
-// of all sources. These are there before any driver is: whoever subscribes to channels once, early, then
-// still hears of a headset that comes later.
+// Holds the statistics of a graph's drivers and describes them as driver channels of the reporting daemon:
+// sinks in the group "Tx", sources in the group "Rx", each driver in a subgroup of its name. The channels
+// without a subgroup hold the totals of all sinks and of all sources. They exist before any driver does, so a
+// program that subscribes once at its start still counts a headset that is connected later.
 //
-// A driver that left keeps its numbers, so that it goes on counting when it comes back, until its room is
-// needed.
+// A driver that has left keeps its numbers, and continues from them when it comes back, until a new driver
+// needs its place.
 class DriverStatistics {
  public:
-  // What comes past them counts under its direction only.
+  // Further drivers are counted in their direction's totals only.
   static constexpr std::size_t kMaxDrivers = 32;
 
-  // Which drivers there are now. One that is new gets its channels.
+  // Sets the drivers that are present now. A new one gets its channels.
   void setPresent(const std::set<DriverNode>& drivers);
   void count(const DriverNode& driver, const ProfiledCycle& cycle, const CycleXruns& xruns);
 
-  // A published file's whole content.
+  // The whole content of a published file.
   ValueMap channelsOf(std::string_view driverName) const;
 
  private:

@@ -12,11 +12,11 @@ Histogram::Histogram(std::initializer_list<std::int64_t> bounds)
     : bounds_(bounds), hits_(bounds.size() - 1) {}
 
 void Histogram::add(std::int64_t value) {
-  // The inner bounds alone decide, so that the outer buckets are open.
+  // Only the inner bounds are compared, so the first and the last bucket are open.
   const auto bucket = std::upper_bound(bounds_.begin() + 1, bounds_.end() - 1, value) - (bounds_.begin() + 1);
   ++hits_[static_cast<std::size_t>(bucket)];
-  least_ = isEmpty_ ? value : std::min(least_, value);
-  greatest_ = isEmpty_ ? value : std::max(greatest_, value);
+  minimum_ = isEmpty_ ? value : std::min(minimum_, value);
+  maximum_ = isEmpty_ ? value : std::max(maximum_, value);
   isEmpty_ = false;
 }
 
@@ -25,8 +25,8 @@ void Histogram::describe(ValueMap& channel) const {
   for (std::size_t i = 0; i < hits_.size(); ++i) {
     buckets.append(ValueMap{{"lower", bounds_[i]}, {"upper", bounds_[i + 1]}, {"hits", hits_[i]}});
   }
-  channel.set("min", least_);
-  channel.set("max", greatest_);
+  channel.set("min", minimum_);
+  channel.set("max", maximum_);
   channel.set("buckets", std::move(buckets));
 }
 

@@ -6,11 +6,12 @@
 
 namespace tonewerk {
 
-// Brings the published channels up to date before a session begins and before it ends: the daemon reads them
-// at both, subscribes to what there is when its first session starts, and reports the difference.
+// Passes calls to another sink, and brings the published channels up to date before a session is made and
+// before it stops. The daemon subscribes to the channels when its first session starts, reads them at each
+// start and stop, and reports the difference.
 class PublishingSessionSink final : public SessionSink {
  public:
-  // Both outlive this.
+  // Both outlive this object.
   PublishingSessionSink(SessionSink& next, ChannelPublisher& publisher)
       : next_(next), publisher_(publisher) {}
 

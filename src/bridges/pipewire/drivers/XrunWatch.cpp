@@ -8,19 +8,20 @@ namespace tonewerk {
 
 namespace {
 
-std::uint32_t rise(std::uint32_t before, std::uint32_t now) { return now >= before ? now - before : now; }
+std::uint32_t increase(std::uint32_t before, std::uint32_t now) { return now >= before ? now - before : now; }
 
 }  // namespace
 
-CycleXruns XrunWatch::judge(const ProfiledCycle& cycle) {
+CycleXruns XrunWatch::update(const ProfiledCycle& cycle) {
   const bool isKnown = drivers_.contains(cycle.driver);
-  // A graph has a handful of drivers. What has piled up here are ones that left unnoticed.
+  // A graph has only a few drivers. So many entries come from drivers that left without retain() being
+  // called.
   if (!isKnown && drivers_.size() >= kMaxDrivers) drivers_.clear();
   Driver& driver = drivers_[cycle.driver];
 
   CycleXruns result;
   result.isRepeat = isKnown && driver.isUnfinished && driver.position == cycle.position;
-  if (isKnown) result.driver = rise(driver.xruns, cycle.xruns);
+  if (isKnown) result.driver = increase(driver.xruns, cycle.xruns);
   driver.xruns = cycle.xruns;
   driver.position = cycle.position;
   driver.isUnfinished = std::any_of(cycle.followers.begin(), cycle.followers.end(),
@@ -35,7 +36,7 @@ CycleXruns XrunWatch::judge(const ProfiledCycle& cycle) {
     now.hasEverFinished = follower.hasFinished || known->second.hasEverFinished;
     std::uint32_t xruns = 0;
     if (follower.xruns) {
-      xruns = rise(known->second.xruns.value_or(*follower.xruns), *follower.xruns);
+      xruns = increase(known->second.xruns.value_or(*follower.xruns), *follower.xruns);
     } else if (!follower.hasFinished && known->second.hasEverFinished && !result.isRepeat) {
       xruns = 1;
     }

@@ -10,25 +10,26 @@
 
 namespace tonewerk {
 
-// What a cycle adds to the xruns of its nodes.
+// Says how many xruns of its nodes a cycle adds.
 struct CycleXruns {
-  bool isRepeat = false;     // the cycle was told before
-  std::uint32_t driver = 0;  // the driver's own
-  // Those of followers that have any: cycles that they did not finish in time.
+  bool isRepeat = false;     // the profiler has reported the cycle before
+  std::uint32_t driver = 0;  // xruns of the driver itself
+  // Xruns by follower, without those that have none. An xrun is a cycle not finished in time.
   std::map<std::uint32_t, std::uint32_t> followers;
 };
 
-// Finds out, cycle by cycle, whose xrun count rises.
+// Finds out, cycle by cycle, which nodes have new xruns.
 //
-// A driver counts its xruns itself. Followers do in later releases of the graph only; else each cycle that
-// one leaves unfinished is an xrun, from its first finished one on: a node that is being started is not late
-// yet. What a node counted before it was first seen is not news; a count that went back began anew.
+// A driver counts its xruns itself. A follower does so only in later releases of PipeWire. Without its count,
+// each cycle that it leaves unfinished is an xrun, but only after it has finished one: a node that is being
+// started is not late. Xruns from before a node was first seen are not counted. A count that went back
+// started again from 0.
 class XrunWatch {
  public:
   static constexpr std::size_t kMaxDrivers = 64;
 
-  CycleXruns judge(const ProfiledCycle& cycle);
-  // Forgets all other drivers.
+  CycleXruns update(const ProfiledCycle& cycle);
+  // Forgets all drivers but these.
   void retain(const std::set<std::uint32_t>& drivers);
 
  private:
@@ -36,7 +37,7 @@ class XrunWatch {
     bool hasEverFinished = false;
     std::optional<std::uint32_t> xruns;
   };
-  // As of its latest cycle; a follower that is not in a cycle is forgotten.
+  // A driver's state in its latest cycle, which holds the followers of that cycle only.
   struct Driver {
     std::uint32_t xruns = 0;
     std::uint64_t position = 0;

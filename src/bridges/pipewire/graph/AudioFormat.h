@@ -6,14 +6,14 @@
 
 namespace tonewerk {
 
-// The form in which a stream hands over its sound.
+// Describes the format of a stream's audio.
 struct AudioFormat {
-  std::string coding;        // "lpcm", else what the sound is packed in: "iec958", "dsd", "mp3"
-  std::string sampleFormat;  // "F32LE", "S16LE"; empty where the coding says it all
+  std::string coding;        // "lpcm", or the encoding: "iec958", "dsd", "mp3"
+  std::string sampleFormat;  // "F32LE", "S16LE"; empty for encoded audio
   std::uint32_t rateHertz = 0;
   std::uint32_t channels = 0;
 
-  // For people and for comparing: "F32LE 48000 Hz 2 ch".
+  // Text for people: "F32LE 48000 Hz 2 ch".
   std::string text() const;
 
   friend bool operator==(const AudioFormat&, const AudioFormat&) = default;

@@ -7,12 +7,12 @@
 
 namespace tonewerk {
 
-// Any process of the graph chooses its texts, of any length and any bytes; what goes to the reporting daemon
-// is text as it takes it, and short.
+// A process in the graph may choose texts of any length and any bytes. The reporting daemon gets at most this
+// many bytes of each, as valid UTF-8.
 inline constexpr std::size_t kMaxTextBytes = 256;
 
-// `text` with U+FFFD for what the daemon does not take for text and a '?' for each control character, cut
-// before the character that would exceed kMaxTextBytes.
+// Returns `text` with U+FFFD in place of invalid UTF-8 and '?' in place of each control character, cut before
+// the character that would exceed kMaxTextBytes.
 std::string cleanText(std::string_view text);
 
 }  // namespace tonewerk

@@ -6,8 +6,8 @@
 
 namespace tonewerk {
 
-// A sink or source that gives the nodes it serves their rhythm. Two of one direction and name are taken for
-// one, so that a device that is plugged in again goes on where it was.
+// Identifies a sink or source that drives other nodes: its clock starts their cycles. Two nodes of the same
+// direction and name count as one driver, so a device that is plugged in again continues its statistics.
 struct DriverNode {
   enum Direction { kSink, kSource };
 

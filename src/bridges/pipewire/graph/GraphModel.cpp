@@ -33,8 +33,8 @@ void mergeInto(Properties& properties, const Properties& update) {
 
 void GraphModel::nodeAppeared(std::uint32_t node, const Properties& properties) {
   mergeInto(nodes_[node].properties, properties);
-  tellAll();
-  tellDrivers(nodes_[node].properties);
+  reportAllStreams();
+  reportDriverChange(nodes_[node].properties);
 }
 
 void GraphModel::nodeDescribed(std::uint32_t node, bool running, const Properties& properties) {
@@ -43,38 +43,38 @@ void GraphModel::nodeDescribed(std::uint32_t node, bool running, const Propertie
   mergeInto(known->second.properties, properties);
   known->second.described = true;
   known->second.running = running;
-  // All, because a sink's name is part of the state of whatever plays to it.
-  tellAll();
-  tellDrivers(known->second.properties);
+  // All streams, because a sink's name is part of the state of each stream that plays to it.
+  reportAllStreams();
+  reportDriverChange(known->second.properties);
 }
 
 void GraphModel::volumeChanged(std::uint32_t node, const StreamVolume& update) {
   const auto known = nodes_.find(node);
   if (known == nodes_.end()) return;
   known->second.volume.merge(update);
-  tell(node);
+  reportStream(node);
 }
 
 void GraphModel::formatChanged(std::uint32_t node, const AudioFormat& format) {
   const auto known = nodes_.find(node);
   if (known == nodes_.end()) return;
   known->second.format = format;
-  tell(node);
+  reportStream(node);
 }
 
 void GraphModel::clientDescribed(std::uint32_t client, const Properties& properties) {
   mergeInto(clients_[client], properties);
-  tellAll();
+  reportAllStreams();
 }
 
 void GraphModel::linkAppeared(std::uint32_t link, std::uint32_t outputNode, std::uint32_t inputNode) {
   links_[link] = {outputNode, inputNode};
-  tell(outputNode);
+  reportStream(outputNode);
 }
 
 void GraphModel::complete() {
   isComplete_ = true;
-  tellAll();
+  reportAllStreams();
 }
 
 void GraphModel::removed(std::uint32_t object) {
@@ -82,16 +82,16 @@ void GraphModel::removed(std::uint32_t object) {
   if (const auto link = links_.find(object); link != links_.end()) {
     const std::uint32_t stream = link->second.outputNode;
     links_.erase(link);
-    tell(stream);
+    reportStream(stream);
   }
   const auto node = nodes_.find(object);
   if (node == nodes_.end()) return;
-  const bool wasTold = node->second.told.has_value();
+  const bool wasReported = node->second.reported.has_value();
   const Properties properties = std::move(node->second.properties);
   nodes_.erase(node);
-  if (wasTold) observer_.streamGone(object);
-  tellAll();
-  tellDrivers(properties);
+  if (wasReported) observer_.streamGone(object);
+  reportAllStreams();
+  reportDriverChange(properties);
 }
 
 void GraphModel::clear() {
@@ -100,7 +100,7 @@ void GraphModel::clear() {
   links_.clear();
   isComplete_ = false;
   for (const auto& [identifier, node] : nodes) {
-    if (node.told) observer_.streamGone(identifier);
+    if (node.reported) observer_.streamGone(identifier);
   }
   onDriversChanged_();
 }
@@ -131,7 +131,7 @@ std::string GraphModel::devicesOf(std::uint32_t stream) const {
   for (const auto& [identifier, link] : links_) {
     if (link.outputNode != stream) continue;
     const auto input = nodes_.find(link.inputNode);
-    // Whatever else listens to a stream, a recorder or a level meter, is no device.
+    // Other listeners of a stream, such as a recorder or a level meter, are not devices.
     if (input != nodes_.end() && isSink(input->second.properties)) {
       names.insert(deviceNameOf(input->second.properties));
     }
@@ -142,11 +142,11 @@ std::string GraphModel::devicesOf(std::uint32_t stream) const {
 }
 
 StreamState GraphModel::stateOf(std::uint32_t stream, const Node& node) const {
-  static const Properties kNobody;
+  static const Properties kNoClient;
   const Properties* client = clientOf(node);
   StreamState state;
   state.described = node.described && (client != nullptr || !node.properties.contains(kClientIDKey));
-  state.application = applicationOf(node.properties, client == nullptr ? kNobody : *client);
+  state.application = applicationOf(node.properties, client == nullptr ? kNoClient : *client);
   state.role = propertyOf(node.properties, kMediaRoleKey);
   state.running = node.running;
   state.volume = node.volume.shown();
@@ -155,22 +155,22 @@ StreamState GraphModel::stateOf(std::uint32_t stream, const Node& node) const {
   return state;
 }
 
-void GraphModel::tell(std::uint32_t stream) {
+void GraphModel::reportStream(std::uint32_t stream) {
   if (!isComplete_) return;
   const auto found = nodes_.find(stream);
   if (found == nodes_.end() || !isOutputStream(found->second.properties)) return;
   Node& node = found->second;
   StreamState state = stateOf(stream, node);
-  if (node.told == state) return;
-  node.told = std::move(state);
-  observer_.streamChanged(stream, *node.told);
+  if (node.reported == state) return;
+  node.reported = std::move(state);
+  observer_.streamChanged(stream, *node.reported);
 }
 
-void GraphModel::tellAll() {
-  for (const auto& [identifier, node] : nodes_) tell(identifier);
+void GraphModel::reportAllStreams() {
+  for (const auto& [identifier, node] : nodes_) reportStream(identifier);
 }
 
-void GraphModel::tellDrivers(const Properties& node) {
+void GraphModel::reportDriverChange(const Properties& node) {
   if (driverOf(node)) onDriversChanged_();
 }
 

@@ -13,46 +13,47 @@
 
 namespace tonewerk {
 
-// Hears of output streams. Calls come from inside GraphModel's functions and must not call back into it.
+// Gets the changes of output streams. It is called from inside GraphModel's functions and must not call back
+// into it.
 class StreamObserver {
  public:
   virtual ~StreamObserver() = default;
-  // A stream is new, or something about it is.
+  // A stream is new or its state has changed.
   virtual void streamChanged(std::uint32_t stream, const StreamState& state) = 0;
   virtual void streamGone(std::uint32_t stream) = 0;
 };
 
-// The part of a sound graph that matters here, put together from what its objects say one by one, in any
-// order: streams, the clients they belong to, the sinks they are linked to, and which sinks and sources drive
-// the others.
+// Holds the relevant part of an audio graph: streams, the clients that own them, the sinks they are linked
+// to, and the sinks and sources that drive other nodes. It is built from the objects' descriptions, which
+// arrive one by one in any order.
 //
-// While a graph is first described nobody hears of its streams: what a stream plays to may be told after it.
+// No stream is reported before complete(), because the sink of a stream may be described after the stream.
 //
-// For one thread. Holds as much as the graph does: what is said of a node that has not appeared, or has left,
-// is ignored.
+// Used on one thread. Its size is bounded by the graph's: descriptions of a node that has not appeared, or
+// has left, are ignored.
 class GraphModel {
  public:
-  // `observer` outlives this.
+  // `observer` outlives this object.
   explicit GraphModel(StreamObserver& observer) : observer_(observer) {}
 
-  // A node is in the graph. `properties` may be a first excerpt.
+  // A node is in the graph. `properties` may be incomplete.
   void nodeAppeared(std::uint32_t node, const Properties& properties);
-  // A node has told about itself in full.
+  // A node has described itself completely.
   void nodeDescribed(std::uint32_t node, bool running, const Properties& properties);
   void volumeChanged(std::uint32_t node, const StreamVolume& update);
   void formatChanged(std::uint32_t node, const AudioFormat& format);
   void clientDescribed(std::uint32_t client, const Properties& properties);
   void linkAppeared(std::uint32_t link, std::uint32_t outputNode, std::uint32_t inputNode);
-  // Everything that was in the graph has been told.
+  // All objects that were in the graph at the start have been described.
   void complete();
   // An object of any kind, known or not, has left the graph.
   void removed(std::uint32_t object);
   // The graph itself is gone.
   void clear();
 
-  // The sinks and sources that drive others, by node.
+  // The sinks and sources that drive other nodes, by node.
   std::map<std::uint32_t, DriverNode> drivers() const;
-  // None when the node is no such driver.
+  // None when the node is not a sink or source that drives others.
   [[nodiscard]] std::optional<DriverNode> driverAt(std::uint32_t node) const;
   // Runs `onChange` whenever drivers() may differ, from inside the functions above.
   void watchDrivers(std::function<void()> onChange) { onDriversChanged_ = std::move(onChange); }
@@ -64,7 +65,7 @@ class GraphModel {
     bool running = false;
     StreamVolume volume;
     std::optional<AudioFormat> format;
-    std::optional<StreamState> told;  // a stream's state as the observer last heard it
+    std::optional<StreamState> reported;  // the stream's state that the observer last got
   };
   struct Link {
     std::uint32_t outputNode;
@@ -74,9 +75,9 @@ class GraphModel {
   const Properties* clientOf(const Node& node) const;
   std::string devicesOf(std::uint32_t stream) const;
   StreamState stateOf(std::uint32_t stream, const Node& node) const;
-  void tell(std::uint32_t stream);
-  void tellAll();
-  void tellDrivers(const Properties& node);
+  void reportStream(std::uint32_t stream);
+  void reportAllStreams();
+  void reportDriverChange(const Properties& node);
 
   StreamObserver& observer_;
   std::function<void()> onDriversChanged_ = [] {};

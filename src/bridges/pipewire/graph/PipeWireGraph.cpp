@@ -24,7 +24,8 @@ Properties propertiesOf(const spa_dict* dictionary) {
   Properties properties;
   if (dictionary == nullptr) return properties;
   for (const std::string_view key : kUsedKeys) {
-    const char* value = spa_dict_lookup(dictionary, key.data());  // the keys are literals, ended by a zero
+    const char* value =
+        spa_dict_lookup(dictionary, key.data());  // the keys are literals, which end with a zero
     if (value != nullptr) properties.emplace(key, value);
   }
   return properties;
@@ -37,7 +38,7 @@ std::optional<std::uint32_t> numberOf(const spa_dict* dictionary, std::string_vi
   return number;
 }
 
-// A proxy for one object of the graph, with its listener.
+// Owns the proxy of one object of the graph, and its listener.
 class BoundObject {
  public:
   explicit BoundObject(pw_proxy* proxy) : proxy_(proxy) {}
@@ -122,10 +123,10 @@ class BoundClient final : public BoundObject {
 
 }  // namespace
 
-// One connection to the PipeWire daemon, and what was bound over it.
+// Owns one connection to the PipeWire daemon, and the objects bound through it.
 class PipeWireGraph::Connection {
  public:
-  // Null when there is no daemon; errno says why.
+  // Null when there is no daemon; errno gives the reason.
   static std::unique_ptr<Connection> make(PipeWireGraph& graph) {
     pw_core* core = pw_context_connect(graph.context_, nullptr, 0);
     if (core == nullptr) return nullptr;
@@ -188,8 +189,8 @@ class PipeWireGraph::Connection {
     pw_registry_add_listener(registry_, &registryListener_, &kEvents, this);
   }
 
-  // The first answer comes after all objects have appeared, and everything about them has been asked; the
-  // second after that has been told.
+  // The first answer comes after all objects have appeared and their descriptions have been requested; the
+  // second comes after these descriptions.
   void onDone(int sequence) {
     if (sequence != sync_) return;
     if (std::exchange(hasListed_, true)) {
@@ -201,7 +202,7 @@ class PipeWireGraph::Connection {
   }
 
   void onError(std::uint32_t object, int result, const char* message) {
-    // Errors of other objects are races with their removal.
+    // Errors on other objects come from their removal while a request was on its way.
     if (object == PW_ID_CORE && result == -EPIPE) {
       if (!std::exchange(broken_, true)) graph_.lost();
       return;
@@ -251,12 +252,12 @@ class PipeWireGraph::Connection {
   pw_core* core_;
   pw_registry* registry_;
   bool broken_ = false;
-  int sync_ = -1;  // the question that is open
+  int sync_ = -1;  // sequence number of the pending sync; -1 when none is
   bool hasListed_ = false;
   spa_hook coreListener_{};
   spa_hook registryListener_{};
   std::map<std::uint32_t, std::unique_ptr<BoundObject>> bound_;
-  std::set<std::uint32_t> streams_;  // of sound, playing or recording
+  std::set<std::uint32_t> streams_;  // audio streams, playing or recording
   std::unique_ptr<PipeWireProfiler> profiler_;
 };
 
@@ -276,7 +277,7 @@ PipeWireGraph::~PipeWireGraph() {
 bool PipeWireGraph::open() {
   context_ = pw_context_new(loop_.native(), nullptr, 0);
   if (context_ == nullptr) return false;
-  if (!PipeWireProfiler::teach(context_)) {
+  if (!PipeWireProfiler::loadProtocol(context_)) {
     console_.say("cannot use PipeWire's profiler: no statistics of drivers, no overloads");
   }
   connect();
@@ -286,7 +287,7 @@ bool PipeWireGraph::open() {
 void PipeWireGraph::connect() {
   connection_ = Connection::make(*this);
   if (connection_ != nullptr) return;
-  if (!std::exchange(saidAbsent_, true)) {
+  if (!std::exchange(hasReportedAbsence_, true)) {
     console_.say(std::string("no PipeWire (") + std::strerror(errno) + "), trying on");
   }
   retryTimer_->arm(retryDelay_.next());
@@ -294,12 +295,12 @@ void PipeWireGraph::connect() {
 
 void PipeWireGraph::established() {
   if (std::exchange(established_, true)) return;
-  saidAbsent_ = false;
+  hasReportedAbsence_ = false;
   retryDelay_.reset();
   console_.say("connected to PipeWire");
 }
 
-// Called from inside the connection, which therefore lives until the timer.
+// Called from inside the connection, so the connection is destroyed later, by the timer.
 void PipeWireGraph::lost() {
   established_ = false;
   console_.say("lost PipeWire");

@@ -14,20 +14,20 @@ struct pw_context;
 
 namespace tonewerk {
 
-// Tells a GraphModel what is in the graph of the PipeWire daemon, and clears it when that daemon goes away;
-// tells a ProfileObserver how its drivers do, as long as there are streams of sound. A daemon that is not
-// there, or no longer, is tried again until it is. It only looks: it adds nothing to the graph.
+// Passes the objects of the PipeWire daemon's graph to a GraphModel, and clears the model when that daemon
+// goes away. Passes the profiler's data to a ProfileObserver while the graph has audio streams. Connects
+// again until a daemon is there. It only reads: it adds nothing to the graph.
 //
-// For the loop's thread.
+// Used on the loop's thread only.
 class PipeWireGraph {
  public:
-  // All outlive this.
+  // All arguments outlive this object.
   PipeWireGraph(PipeWireLoop& loop, GraphModel& model, ProfileObserver& profiles, const Console& console);
   PipeWireGraph(const PipeWireGraph&) = delete;
   PipeWireGraph& operator=(const PipeWireGraph&) = delete;
   ~PipeWireGraph();
 
-  // False when the library itself cannot be used (its configuration is missing): trying again would not help.
+  // False when the library cannot be used because its configuration is missing; trying again would not help.
   [[nodiscard]] bool open();
 
  private:
@@ -45,8 +45,8 @@ class PipeWireGraph {
   pw_context* context_ = nullptr;
   std::unique_ptr<Connection> connection_;
   GrowingDelay retryDelay_{std::chrono::milliseconds(250), std::chrono::milliseconds(4000)};
-  bool established_ = false;  // the daemon of this connection has spoken
-  bool saidAbsent_ = false;
+  bool established_ = false;  // this connection's daemon has answered
+  bool hasReportedAbsence_ = false;
   std::unique_ptr<EventLoop::Timer> retryTimer_;
 };
 

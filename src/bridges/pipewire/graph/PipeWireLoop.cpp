@@ -10,7 +10,7 @@ namespace {
 
 using Callback = std::function<void()>;
 
-// A source of the native loop and what it runs.
+// Owns a source of the native loop and the callback that it runs.
 class NativeSource {
  public:
   NativeSource(pw_loop* loop, Callback callback)
@@ -51,7 +51,7 @@ class LoopTimer final : public EventLoop::Timer {
   }
 
   void arm(std::chrono::nanoseconds delay) override {
-    // A zero would disarm it.
+    // A delay of zero would disarm the timer.
     const std::chrono::nanoseconds wait = std::max(delay, std::chrono::nanoseconds(1));
     const auto seconds = std::chrono::duration_cast<std::chrono::seconds>(wait);
     set({seconds.count(), (wait - seconds).count()});

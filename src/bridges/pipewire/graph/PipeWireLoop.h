@@ -10,7 +10,8 @@ struct pw_main_loop;
 
 namespace tonewerk {
 
-// The event loop on which PipeWire's own events arrive. pw_init() comes before it, pw_deinit() after.
+// Runs the event loop on which PipeWire's events arrive. pw_init() must be called before it is made, and
+// pw_deinit() after it is destroyed.
 class PipeWireLoop final : public EventLoop {
  public:
   // Null when the system refuses.
@@ -21,10 +22,10 @@ class PipeWireLoop final : public EventLoop {
 
   [[nodiscard]] std::unique_ptr<Source> watch(int descriptor, std::function<void()> onReadable) override;
   [[nodiscard]] std::unique_ptr<Timer> makeTimer(std::function<void()> onExpired) override;
-  // Takes the signal from the process: from now on it only runs `onSignal`. Null when the system refuses.
+  // Replaces the signal's effect on the process: it now only runs `onSignal`. Null when the system refuses.
   [[nodiscard]] std::unique_ptr<Source> watchSignal(int signal, std::function<void()> onSignal);
 
-  // Returns after quit(), which is called from a callback.
+  // Runs callbacks until one of them calls quit().
   void run();
   void quit();
 

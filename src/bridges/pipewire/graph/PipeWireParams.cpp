@@ -22,8 +22,8 @@ std::string_view shortNameIn(const spa_type_info* table, std::uint32_t type) {
   return info == nullptr ? std::string_view() : std::string_view(spa_debug_type_short_name(info->name));
 }
 
-// The value itself, where a pod offers it as a choice of one: formats come so.
-const spa_pod& plain(const spa_pod& pod) {
+// Returns the value of a pod, also when it is wrapped in a choice of one value, as in formats.
+const spa_pod& chosenValue(const spa_pod& pod) {
   std::uint32_t count = 0;
   std::uint32_t choice = 0;
   return *spa_pod_get_values(&pod, &count, &choice);
@@ -34,19 +34,19 @@ std::string codingOf(std::uint32_t mediaSubtype) {
   return std::string(shortNameIn(spa_type_media_subtype, mediaSubtype));
 }
 
-// Empty for what has none: packed sound.
+// Empty when the format has none, as for encoded audio.
 std::string sampleFormatOf(const spa_pod& format) {
   const spa_pod_prop* property = spa_pod_find_prop(&format, nullptr, SPA_FORMAT_AUDIO_format);
   std::uint32_t sample = SPA_AUDIO_FORMAT_UNKNOWN;
-  if (property == nullptr || spa_pod_get_id(&plain(property->value), &sample) < 0) return {};
+  if (property == nullptr || spa_pod_get_id(&chosenValue(property->value), &sample) < 0) return {};
   return std::string(shortNameIn(spa_type_audio_format, sample));
 }
 
-// 0 when it says nothing, or nothing sensible.
+// 0 when the property is missing, not a number, or negative.
 std::uint32_t countOf(const spa_pod& format, std::uint32_t key) {
   const spa_pod_prop* property = spa_pod_find_prop(&format, nullptr, key);
   std::int32_t count = 0;
-  if (property == nullptr || spa_pod_get_int(&plain(property->value), &count) < 0) return 0;
+  if (property == nullptr || spa_pod_get_int(&chosenValue(property->value), &count) < 0) return 0;
   return static_cast<std::uint32_t>(std::max(count, 0));
 }
 

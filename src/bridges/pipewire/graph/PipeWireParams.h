@@ -10,12 +10,12 @@ struct spa_pod;
 
 namespace tonewerk {
 
-// What a node's parameters say, out of PipeWire's binary form. Both take any well-formed pod; what it does
-// not hold is not in the result.
+// These functions read a node's parameters from PipeWire's binary form. Both accept any well-formed pod; a
+// value that the pod does not hold is missing in the result.
 
 StreamVolume volumeOf(const spa_pod& properties);
 
-// None when it is no format of sound, or lacks rate or coding.
+// None when the format is not one of audio, or lacks the rate or the encoding.
 [[nodiscard]] std::optional<AudioFormat> formatOf(const spa_pod& format);
 
 }  // namespace tonewerk

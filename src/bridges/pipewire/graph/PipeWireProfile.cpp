@@ -11,20 +11,21 @@ namespace {
 
 using std::chrono::nanoseconds;
 
-// Far above what any graph uses. The memory that these numbers come from is shared with clients.
+// Limits far above the values of any real graph. Clients can write to the memory that these numbers come
+// from.
 constexpr std::int64_t kMaxFrames = 1 << 20;
 constexpr std::uint32_t kMaxHertz = 1 << 24;
-constexpr nanoseconds kLongest = std::chrono::seconds(60);
+constexpr nanoseconds kMaxDuration = std::chrono::seconds(60);
 
-// The activation's state of a node that is done with its cycle.
+// Activation status of a node that has finished its cycle.
 constexpr std::int32_t kFinished = 3;
 
 struct NodeBlock {
   std::int32_t node = 0;
-  std::int64_t signal = 0;  // woken; monotonic nanoseconds, as below
+  std::int64_t signal = 0;  // when it was woken; monotonic nanoseconds, like `finish`
   std::int64_t finish = 0;
   std::int32_t status = 0;
-  std::int32_t xruns = -1;  // later releases count them for each node
+  std::int32_t xruns = -1;  // -1 in earlier releases of PipeWire, which do not count them
 };
 
 std::optional<NodeBlock> nodeBlockOf(const spa_pod& pod) {
@@ -67,7 +68,7 @@ bool readClock(const spa_pod& pod, ProfiledCycle& cycle) {
   if (result < 0 || frames <= 0 || frames > kMaxFrames) return false;
   if (rate.num == 0 || rate.denom == 0 || rate.num > kMaxHertz || rate.denom > kMaxHertz) return false;
   const double seconds = static_cast<double>(frames) * rate.num / rate.denom;
-  if (seconds > std::chrono::duration<double>(kLongest).count()) return false;
+  if (seconds > std::chrono::duration<double>(kMaxDuration).count()) return false;
   cycle.frames = static_cast<std::uint32_t>(frames);
   cycle.position = static_cast<std::uint64_t>(position);
   cycle.period = nanoseconds(static_cast<std::int64_t>(seconds * 1e9));
@@ -80,7 +81,7 @@ bool readDriver(const spa_pod& pod, ProfiledCycle& cycle) {
   cycle.driver = static_cast<std::uint32_t>(block->node);
   if (block->signal <= 0) return true;
   cycle.begin = nanoseconds(block->signal);
-  if (block->finish < block->signal || block->finish - block->signal > kLongest.count()) return true;
+  if (block->finish < block->signal || block->finish - block->signal > kMaxDuration.count()) return true;
   cycle.processing = nanoseconds(block->finish - block->signal);
   return true;
 }
@@ -94,7 +95,7 @@ void addFollower(const spa_pod& pod, ProfiledCycle& cycle) {
   cycle.followers.push_back(follower);
 }
 
-// The object's parts come in any order; each of the first three has to be there.
+// The object's parts come in any order. Information, clock and driver must be there.
 std::optional<ProfiledCycle> cycleOf(const spa_pod_object& object) {
   ProfiledCycle cycle;
   bool hasInfo = false;

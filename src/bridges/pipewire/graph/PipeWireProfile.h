@@ -9,9 +9,9 @@ struct spa_pod;
 
 namespace tonewerk {
 
-// What PipeWire's profiler tells in one go, out of its binary form: cycles of any drivers, each driver's in
-// their order. Takes any well-formed pod. A cycle without clock or driver, or with a clock that cannot be, is
-// not in the result.
+// Reads one report of PipeWire's profiler from its binary form: cycles of any drivers, in order for each
+// driver. Accepts any well-formed pod. Leaves out a cycle that lacks information, clock or driver, or whose
+// clock has impossible values.
 std::vector<ProfiledCycle> cyclesOf(const spa_pod& profile);
 
 }  // namespace tonewerk

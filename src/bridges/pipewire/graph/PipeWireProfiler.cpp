@@ -35,7 +35,7 @@ class PipeWireProfiler::Bound {
   spa_hook listener_{};
 };
 
-bool PipeWireProfiler::teach(pw_context* context) {
+bool PipeWireProfiler::loadProtocol(pw_context* context) {
   return pw_context_load_module(context, PW_EXTENSION_MODULE_PROFILER, nullptr, nullptr) != nullptr;
 }
 

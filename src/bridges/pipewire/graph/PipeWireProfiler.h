@@ -12,23 +12,23 @@ struct pw_registry;
 
 namespace tonewerk {
 
-// Listens to a graph's profiler, as long as somebody wants it to: while anybody listens, every cycle of every
-// driver costs the graph a note of its times.
+// Listens to a graph's profiler while setWanted() asks for it. While any program listens, the graph records
+// the times of every cycle of every driver, which costs it time.
 //
-// For the loop's thread.
+// Used on the loop's thread only.
 class PipeWireProfiler {
  public:
-  // Teaches the context the profiler's part of the protocol. Once, before any connection; false when the
-  // library lacks it: a graph's profiler then cannot be found.
-  [[nodiscard]] static bool teach(pw_context* context);
+  // Loads the profiler's part of the protocol into the context. Call it once, before any connection. False
+  // when the library lacks it: a graph's profiler then cannot be used.
+  [[nodiscard]] static bool loadProtocol(pw_context* context);
 
-  // Both outlive this.
+  // Both outlive this object.
   PipeWireProfiler(pw_registry* registry, ProfileObserver& observer);
   PipeWireProfiler(const PipeWireProfiler&) = delete;
   PipeWireProfiler& operator=(const PipeWireProfiler&) = delete;
   ~PipeWireProfiler();
 
-  // The graph has a profiler, under this number. Of several the first counts.
+  // The graph has a profiler of this number. Of several, the first is used.
   void appeared(std::uint32_t identifier);
   void removed(std::uint32_t identifier);
   void setWanted(bool isWanted);

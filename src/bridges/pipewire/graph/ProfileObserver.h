@@ -7,11 +7,11 @@
 
 namespace tonewerk {
 
-// Hears what the graph's profiler tells.
+// Gets the reports of the graph's profiler.
 class ProfileObserver {
  public:
   virtual ~ProfileObserver() = default;
-  // Of any drivers, each driver's cycles in their order; some time after they were.
+  // Cycles of any drivers, in order for each driver. They arrive about a second after they took place.
   virtual void profiled(const std::vector<ProfiledCycle>& cycles) = 0;
 };
 

@@ -20,7 +20,8 @@ bool isStream(const Properties& node) {
 }
 
 bool isSink(const Properties& node) {
-  // "Audio/Sink/Virtual" and the like too; a duplex device is a sink to what plays into it.
+  // Includes subclasses such as "Audio/Sink/Virtual". A duplex device is a sink for the streams that play to
+  // it.
   const std::string_view mediaClass = propertyOf(node, kMediaClassKey);
   return mediaClass.starts_with("Audio/Sink") || mediaClass.starts_with("Audio/Duplex");
 }

@@ -9,7 +9,7 @@
 
 namespace tonewerk {
 
-// An object's properties, or those of them that somebody here reads.
+// Properties of a PipeWire object; only those of kUsedKeys are needed.
 using Properties = std::map<std::string, std::string, std::less<>>;
 
 inline constexpr std::string_view kMediaClassKey = "media.class";
@@ -25,29 +25,29 @@ inline constexpr std::string_view kClientIDKey = "client.id";
 inline constexpr std::string_view kLinkOutputNodeKey = "link.output.node";
 inline constexpr std::string_view kLinkInputNodeKey = "link.input.node";
 
-// Every key above: what an adapter needs to hand over.
+// All keys above: an adapter must pass on these properties.
 inline constexpr std::array kUsedKeys = {kMediaClassKey,      kMediaRoleKey,         kNodeNameKey,
                                          kNodeDescriptionKey, kNodeNickKey,          kNodeDriverKey,
                                          kApplicationIDKey,   kApplicationBinaryKey, kApplicationNameKey,
                                          kClientIDKey,        kLinkOutputNodeKey,    kLinkInputNodeKey};
 
-// Empty when absent.
+// Empty when the property is missing.
 std::string_view propertyOf(const Properties& properties, std::string_view key);
 
 bool isOutputStream(const Properties& node);
-// An output stream, or one that records.
+// An output stream or an input stream.
 bool isStream(const Properties& node);
-// A duplex device is a sink.
+// A duplex device counts as a sink.
 bool isSink(const Properties& node);
 bool isSource(const Properties& node);
-// Whether it gives others the rhythm when it runs: hardware does, a filter does not.
+// Whether the node drives others when it runs: hardware does, a filter does not.
 bool isDriver(const Properties& node);
 
-// What people call a sink: its description, else its nickname, else its name.
+// The name of a sink for people: its description, else its nickname, else its name.
 std::string deviceNameOf(const Properties& sink);
 
-// Who plays: the application's identifier, else its binary, else its name, each as the node says it or else
-// its client; else the node's own name.
+// The application that plays: its identifier, else its binary, else its name, each from the node or else from
+// the client; else the node's own name.
 std::string applicationOf(const Properties& node, const Properties& client);
 
 // The service type under which a stream of this media role is reported.

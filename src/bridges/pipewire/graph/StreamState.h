@@ -8,17 +8,18 @@
 
 namespace tonewerk {
 
-// What is known of an output stream at one moment. Knowledge arrives in pieces: a stream is in the graph
-// before its owner, its format or its links are.
+// Holds what is known about an output stream at one moment. A stream appears in the graph before its client,
+// its format and its links.
 struct StreamState {
-  bool described = false;   // `application` and `role` are all that will come
-  std::string application;  // who plays
-  std::string role;         // the stream's media role, as "Music"; may stay empty
+  bool described = false;   // `application` and `role` are final
+  std::string application;  // that plays
+  std::string role;         // the stream's media role, such as "Music"; may stay empty
   bool running = false;
-  std::optional<double> volume;  // 0 to 1 as a mixer shows it
+  std::optional<double> volume;  // 0 to 1, as a mixer shows it
   std::optional<AudioFormat> format;
-  std::string
-      device;  // description of the sink it plays to, or of several in alphabetical order; empty when none
+  // Description of the sink that it plays to, or of several sinks in alphabetical order; empty when there is
+  // none.
+  std::string device;
 
   friend bool operator==(const StreamState&, const StreamState&) = default;
 };

@@ -8,8 +8,8 @@ namespace tonewerk {
 
 namespace {
 
-// Factors are single-precision: 0.3 set in a mixer comes back as 0.30000001. Rounded, so that it reads as it
-// was set and so that a factor's last bits are no change of volume.
+// Factors have single precision: 0.3 set in a mixer comes back as 0.30000001. Rounding restores the value
+// that was set, and a difference in the last bits is then not a change of volume.
 constexpr double kSteps = 10'000.0;
 
 double sliderOf(double factor) {

@@ -15,13 +15,14 @@ using std::chrono::milliseconds;
 
 std::string textOf(int error) { return std::generic_category().message(error); }
 
-// Where the loop's thread waits for an answer that comes on the library's.
-class Awaited {
+// Lets the loop's thread wait for an answer that arrives on the library's thread.
+class PendingAnswer {
  public:
   static void answered(void* context, const twr_answer* answer) {
-    // Its own share, for who waits may have given up.
-    const std::unique_ptr<std::shared_ptr<Awaited>> share(static_cast<std::shared_ptr<Awaited>*>(context));
-    Awaited& self = **share;
+    // This call owns a reference of its own, because the waiting thread may have given up.
+    const std::unique_ptr<std::shared_ptr<PendingAnswer>> share(
+        static_cast<std::shared_ptr<PendingAnswer>*>(context));
+    PendingAnswer& self = **share;
     const MutexLock lock(self.mutex_);
     self.status_ = answer->status;
     self.isAnswered_.notifyAll();
@@ -43,8 +44,8 @@ class Awaited {
 
 }  // namespace
 
-// Who wants to know what became of a request.
-struct DaemonLink::Asked {
+// Identifies the request that an answer belongs to, so that a refusal can be reported with its method.
+struct DaemonLink::PendingRequest {
   DaemonLink& link;
   const char* method;
 };
@@ -62,7 +63,7 @@ bool DaemonLink::open(std::function<void(Connection connection)> onConnected) {
   options.state_changed = &DaemonLink::stateChanged;
   options.context = this;
   client_ = inbox_.isOpen() ? twr_client_create(&options) : nullptr;
-  // Not to wait, but to begin before there is anything to say.
+  // A timeout of 0: this starts the connection before the first message, and does not wait for it.
   const twr_status status = twr_client_connect(client_, 0);
   return status == TWR_OK || status == TWR_NOT_CONNECTED || status == TWR_TIMED_OUT;
 }
@@ -70,15 +71,15 @@ bool DaemonLink::open(std::function<void(Connection connection)> onConnected) {
 std::string DaemonLink::socketPath() const { return info().socket_path; }
 
 bool DaemonLink::finish(milliseconds timeout) {
-  // Requests are served in their order, so that any answer to this one says that all before it are done. And
-  // their answers have been read: closing a socket with unread bytes would break it for what the daemon has
-  // yet to read.
-  const auto awaited = std::make_shared<Awaited>();
-  auto share = std::make_unique<std::shared_ptr<Awaited>>(awaited);
-  if (!isConnected_ || twr_client_get_all_reporters(client_, &Awaited::answered, share.get()) != TWR_OK)
+  // The daemon serves requests in order, so any answer to this one means that all earlier requests are done.
+  // It also means that their answers have been read. Closing a socket with unread answers would discard the
+  // requests that the daemon has not read yet.
+  const auto answer = std::make_shared<PendingAnswer>();
+  auto share = std::make_unique<std::shared_ptr<PendingAnswer>>(answer);
+  if (!isConnected_ || twr_client_get_all_reporters(client_, &PendingAnswer::answered, share.get()) != TWR_OK)
     return false;
   static_cast<void>(share.release());
-  return awaited->waitForSuccess(timeout);
+  return answer->waitForSuccess(timeout);
 }
 
 void DaemonLink::create(std::int64_t reporterID) {
@@ -91,17 +92,19 @@ void DaemonLink::configure(std::int64_t reporterID, std::uint16_t serviceType,
                            const ValueMap& configuration) {
   ValuePayload payload;
   payload.set(configuration);
-  // The service type first: changing that of a configured session would make a new one.
-  ask("setServiceType", [&](twr_reply reply, void* context) {
+  // The service type goes first: changing it in a configured session would make the daemon replace the
+  // session.
+  request("setServiceType", [&](twr_reply reply, void* context) {
     return twr_session_set_service_type(session(reporterID), serviceType, reply, context);
   });
-  ask("setConfiguration", [&](twr_reply reply, void* context) {
+  request("setConfiguration", [&](twr_reply reply, void* context) {
     return twr_session_set_configuration(session(reporterID), payload.get(), reply, context);
   });
 }
 
 void DaemonLink::start(std::int64_t reporterID) {
-  // Its answer comes with the stop. With a reply each live session would keep one waiting.
+  // The daemon answers a start when the session stops, so a reply would stay pending for the session's whole
+  // life. A start that the library does not take has no consequence here: SessionSink reports no failures.
   twr_session_start(session(reporterID), nullptr, nullptr);
 }
 
@@ -112,18 +115,19 @@ void DaemonLink::message(std::int64_t reporterID, std::uint32_t category, std::u
   }
   ValuePayload payload;
   payload.set(message);
-  ask("sendMessage", [&](twr_reply reply, void* context) {
+  request("sendMessage", [&](twr_reply reply, void* context) {
     return twr_session_send(session(reporterID), category, type, payload.get(), reply, context);
   });
 }
 
 void DaemonLink::stop(std::int64_t reporterID) {
-  ask("stopReportingSessionForID",
-      [&](twr_reply reply, void* context) { return twr_session_stop(session(reporterID), reply, context); });
+  request("stopReportingSessionForID", [&](twr_reply reply, void* context) {
+    return twr_session_stop(session(reporterID), reply, context);
+  });
 }
 
 void DaemonLink::destroy(std::int64_t reporterID) {
-  ask("destroyReportingSession", [&](twr_reply reply, void* context) {
+  request("destroyReportingSession", [&](twr_reply reply, void* context) {
     return twr_session_destroy(session(reporterID), reply, context);
   });
   sessions_.erase(reporterID);
@@ -142,24 +146,26 @@ twr_session* DaemonLink::session(std::int64_t reporterID) const {
 }
 
 template <class Call>
-void DaemonLink::ask(const char* method, Call call) {
-  auto asked = std::make_unique<Asked>(Asked{*this, method});
-  if (call(&DaemonLink::answered, asked.get()) == TWR_OK) static_cast<void>(asked.release());
+void DaemonLink::request(const char* method, Call call) {
+  auto pending = std::make_unique<PendingRequest>(PendingRequest{*this, method});
+  // The library now owns it, and gives it to answered(). A request that the library does not take has no
+  // answer.
+  if (call(&DaemonLink::answered, pending.get()) == TWR_OK) static_cast<void>(pending.release());
 }
 
-// On the library's thread.
+// Runs on the library's thread.
 void DaemonLink::answered(void* context, const twr_answer* answer) {
-  const std::unique_ptr<Asked> asked(static_cast<Asked*>(context));
+  const std::unique_ptr<PendingRequest> pending(static_cast<PendingRequest*>(context));
   if (answer->status != TWR_REFUSED) return;
   const std::string message = answer->error_message;
-  std::string refusal = std::string(asked->method) + " refused: " + answer->error_domain + " " +
+  std::string refusal = std::string(pending->method) + " refused: " + answer->error_domain + " " +
                         std::to_string(answer->error_code);
   if (!message.empty()) refusal += " (" + message + ")";
-  DaemonLink& link = asked->link;
+  DaemonLink& link = pending->link;
   link.inbox_.post([&link, refusal] { link.reportRefusal(refusal); });
 }
 
-// On the library's thread.
+// Runs on the library's thread.
 void DaemonLink::stateChanged(void* context, twr_state state) {
   auto& link = *static_cast<DaemonLink*>(context);
   link.inbox_.post([&link, state] { link.changed(state, link.info().last_error); });
@@ -170,14 +176,14 @@ void DaemonLink::changed(twr_state state, int error) {
   if (state != TWR_STATE_WAITING && state != TWR_STATE_ENDED) return;
   if (std::exchange(isConnected_, false)) {
     console_.say("lost the reporting daemon (" + textOf(error) + ")");
-  } else if (!std::exchange(saidAbsent_, true)) {
+  } else if (!std::exchange(hasReportedAbsence_, true)) {
     console_.say("no reporting daemon (" + textOf(error) + "), trying on");
   }
 }
 
 void DaemonLink::connected() {
   isConnected_ = true;
-  saidAbsent_ = false;
+  hasReportedAbsence_ = false;
   lastRefusal_.clear();
   console_.say("connected to the reporting daemon");
   onConnected_(std::exchange(wasConnected_, true) ? Connection::kAgain : Connection::kFirst);

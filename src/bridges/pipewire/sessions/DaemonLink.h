@@ -14,35 +14,38 @@
 
 namespace tonewerk {
 
-// The way to the reporting daemon: the client library, whose connection comes and goes by itself.
+// Sends sessions and messages to the reporting daemon through the client library, which connects and
+// reconnects by itself.
 //
-//   open()    no daemon yet: everything is swallowed
+//   open()    no daemon yet: all calls are ignored
 //                |
 //             onConnected(kFirst): users begin their sessions
 //                |
-//             the daemon goes: what is said waits, up to the library's bound
+//             the daemon goes away: messages wait, up to the library's limit
 //                |
-//             onConnected(kAgain): the library has made the sessions again. What they had been told before is
-//                                  gone with the old daemon, so users tell how things stand
+//             onConnected(kAgain): the library has made the sessions again. The old daemon's messages are
+//                                  lost, so users send their present state
 //
-// Nothing here waits but finish(). For the loop's thread, on which everything is called back, too.
+// Only finish() waits. All calls are made on the loop's thread, and all callbacks run on it.
 class DaemonLink final : public SessionSink {
  public:
   enum class Connection { kFirst, kAgain };
 
-  // `socketPath` empty: where the daemon usually is. `loop` and `console` outlive this.
+  // An empty `socketPath` means the daemon's usual socket. `loop` and `console` outlive this object.
   DaemonLink(EventLoop& loop, const Console& console, std::string socketPath = {});
   DaemonLink(const DaemonLink&) = delete;
   DaemonLink& operator=(const DaemonLink&) = delete;
   ~DaemonLink() override;
 
-  // Called once. `onConnected` must not destroy this. False without memory or descriptors.
+  // Must be called once. `onConnected` must not destroy this object. False when the system has no memory or
+  // no descriptors.
   [[nodiscard]] bool open(std::function<void(Connection connection)> onConnected);
   bool isConnected() const { return isConnected_; }
-  // Where the daemon is, or was last; empty before the first connection.
+  // The socket of the current or the latest connection; empty before the first one.
   std::string socketPath() const;
 
-  // Waits, at most `timeout`, until the daemon has done what it was asked. False when it has not.
+  // Waits at most `timeout` until the daemon has served all requests. False when it has not, or is not
+  // connected.
   [[nodiscard]] bool finish(std::chrono::milliseconds timeout);
 
   void create(std::int64_t reporterID) override;
@@ -54,13 +57,14 @@ class DaemonLink final : public SessionSink {
   void destroy(std::int64_t reporterID) override;
 
  private:
-  struct Asked;
+  struct PendingRequest;
 
   twr_client_info info() const;
   twr_session* session(std::int64_t reporterID) const;
-  // `call` makes a request with a reply that reports a refusal.
+  // Runs `call`, which makes a request with the given reply function and context. The reply reports a
+  // refusal.
   template <class Call>
-  void ask(const char* method, Call call);
+  void request(const char* method, Call call);
   static void answered(void* context, const twr_answer* answer);
   static void stateChanged(void* context, twr_state state);
   void changed(twr_state state, int error);
@@ -72,11 +76,11 @@ class DaemonLink final : public SessionSink {
   std::function<void(Connection connection)> onConnected_;
   bool isConnected_ = false;
   bool wasConnected_ = false;
-  bool saidAbsent_ = false;
-  std::string lastRefusal_;  // said once, however often it comes in a row
+  bool hasReportedAbsence_ = false;
+  std::string lastRefusal_;  // the same refusal is reported once in a row
   LoopInbox inbox_;
-  twr_client* client_ = nullptr;                   // puts into the inbox until it is destroyed
-  std::map<std::int64_t, twr_session*> sessions_;  // the client's
+  twr_client* client_ = nullptr;                   // posts to the inbox until it is destroyed
+  std::map<std::int64_t, twr_session*> sessions_;  // owned by client_
 };
 
 }  // namespace tonewerk

@@ -6,12 +6,13 @@
 
 namespace tonewerk {
 
-// A stream's sound was not ready in time, or its device ran dry; of several in a row the last.
+// A stream's data was not ready in time, or its device ran out of data. Several in a row are added up: the
+// time and the cycle are then those of the latest.
 struct Overload {
   double time = 0;           // seconds since 1970
-  std::uint32_t frames = 0;  // of the smallest of the cycles
-  std::uint64_t cycle = 0;   // the driver's cycle
-  std::uint32_t xruns = 0;   // how many
+  std::uint32_t frames = 0;  // length of the shortest of the cycles
+  std::uint64_t cycle = 0;   // number of the driver's cycle
+  std::uint32_t xruns = 0;   // number of xruns
 
   void add(const Overload& later) {
     time = later.time;

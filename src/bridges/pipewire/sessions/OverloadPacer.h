@@ -8,24 +8,24 @@
 
 namespace tonewerk {
 
-// Lets one overload pass at once and gathers those of the next second into one: a stream that hangs is late
-// some fifty times a second. Times are monotonic.
+// Limits the rate of overload reports: the first one passes at once, and those of the following second are
+// added up to one. A stream that hangs is late some fifty times a second. All times are monotonic.
 class OverloadPacer {
  public:
   static constexpr std::chrono::seconds kInterval{1};
 
   void add(const Overload& overload);
-  // What is to be told now, if anything.
+  // Removes and returns the overload that is due at `now`, if there is one.
   [[nodiscard]] std::optional<Overload> take(std::chrono::nanoseconds now);
-  // Whatever there is, too early or not.
+  // Removes and returns the held overload, due or not.
   [[nodiscard]] std::optional<Overload> takeRest();
-  // When take() will have something; none when nothing is held.
+  // When take() will return an overload; none when nothing is held.
   std::optional<std::chrono::nanoseconds> deadline() const;
   void clear() { held_.reset(); }
 
  private:
   std::optional<Overload> held_;
-  std::optional<std::chrono::nanoseconds> earliest_;  // for the next; none before the first
+  std::optional<std::chrono::nanoseconds> earliest_;  // time for the next report; none before the first
 };
 
 }  // namespace tonewerk

@@ -11,7 +11,7 @@ constexpr std::int64_t kProcesses = 1 << 10;
 constexpr std::int64_t kTimes = std::int64_t{1} << 43;  // milliseconds until the year 2248
 
 std::int64_t millisecondsOf(double seconds) {
-  // A clock far off is still a clock: its times repeat no earlier than the real ones.
+  // A wrong clock is limited to the range, not refused: its times do not repeat earlier than correct times.
   const double milliseconds = std::clamp(seconds * 1000.0, 0.0, static_cast<double>(kTimes - 1));
   return static_cast<std::int64_t>(milliseconds);
 }

@@ -7,15 +7,15 @@
 
 namespace tonewerk {
 
-// Chooses reporter identifiers: never one that this run or a recent one has had, and none that another bridge
-// chooses at the same time.
+// Chooses reporter identifiers. No identifier repeats one of this run or of a recent run, and two bridges
+// that run at the same time choose different ones.
 //
 // An identifier is the time in milliseconds, followed by ten bits of the process identifier. Within a run the
-// first part always grows, also when the wall clock stands or goes back. All are above 1 and below 2^53, so
-// that programs that read the reports' JSON into doubles see them unharmed.
+// time part always grows, also when the wall clock stops or goes back. All identifiers are above 1 and below
+// 2^53, so programs that read the reports' JSON into doubles get the exact values.
 class ReporterIdentifiers {
  public:
-  // `clock` outlives this.
+  // `clock` outlives this object.
   ReporterIdentifiers(const Clock& clock, std::int64_t processIdentifier);
 
   std::int64_t next();

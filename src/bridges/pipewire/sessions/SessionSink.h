@@ -8,10 +8,10 @@
 
 namespace tonewerk {
 
-// Where sessions go: the reporting daemon.
+// Receives sessions and their messages; the real one is the reporting daemon.
 //
-// Nothing fails and nothing waits. Before the daemon is there everything is swallowed, and its users are then
-// told to begin their sessions; when it has been away, they are told to say how things stand (see
+// No call fails or waits. Calls made before the daemon is there are ignored, and the users are asked to begin
+// their sessions when it comes. After the daemon was away, they are asked to send their present state (see
 // DaemonLink).
 class SessionSink {
  public:

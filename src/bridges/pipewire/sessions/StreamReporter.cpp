@@ -14,47 +14,47 @@ StreamReporter::StreamReporter(SessionSink& sink, const Clock& clock, ReporterId
     : sink_(sink), clock_(clock), identifiers_(identifiers), appearedAt_(clock.monotonic()) {}
 
 void StreamReporter::update(const StreamState& state) {
-  if (playback_.running != state.running) tellHeld();
+  if (playback_.running != state.running) sendHeldChange();
   const Playback before = playback_;
-  take(state);
+  mergeState(state);
   if (reporterID_ == 0 && described_) beginSession();
 
   if (playback_ == before) return;
   if (before.running && !playback_.running) {
-    tell(clock_.now());
+    sendState(clock_.now());
   } else {
-    hold();
+    holdChange();
   }
 }
 
 void StreamReporter::overloaded(const Overload& overload) {
   overloads_.add(overload);
-  if (reporterID_ != 0) tellOverload(overloads_.take(clock_.monotonic()));
+  if (reporterID_ != 0) sendOverload(overloads_.take(clock_.monotonic()));
 }
 
 void StreamReporter::restart() {
   const bool wasBegun = reporterID_ != 0;
   appearedAt_ = clock_.monotonic();
   reporterID_ = 0;
-  told_.reset();
+  reported_.reset();
   held_.reset();
   overloads_.clear();
   if (wasBegun) beginSession();
-  hold();
+  holdChange();
 }
 
-void StreamReporter::retell() {
+void StreamReporter::resend() {
   if (reporterID_ == 0) return;
-  told_.reset();
-  // What is held is told with all of the state in any case, and with the time at which it happened.
-  if (!held_) hold();
+  reported_.reset();
+  // A held change is sent anyway, with the whole state and with the time of the change.
+  if (!held_) holdChange();
 }
 
 void StreamReporter::end() {
-  tellHeld();
+  sendHeldChange();
   playback_.running = false;
   if (reporterID_ == 0) beginSession();
-  tellOverload(overloads_.takeRest());
+  sendOverload(overloads_.takeRest());
   ValueMap message = messageFor(clock_.now());
   message.set(kSessionDurationKey, std::chrono::duration<double>(clock_.monotonic() - appearedAt_).count());
   sink_.message(reporterID_, kOutputCategory, kStopType, std::move(message));
@@ -63,8 +63,8 @@ void StreamReporter::end() {
 }
 
 std::optional<std::chrono::nanoseconds> StreamReporter::deadline() const {
-  // A session waits for its description no longer than a message for its contents.
-  if (reporterID_ == 0) return appearedAt_ + kLongestHold;
+  // A session waits for its description no longer than a start waits for its values.
+  if (reporterID_ == 0) return appearedAt_ + kMaxHold;
   const std::optional<std::chrono::nanoseconds> change = changeDeadline();
   const std::optional<std::chrono::nanoseconds> overload = overloads_.deadline();
   return change && overload ? std::min(change, overload) : (change ? change : overload);
@@ -72,7 +72,7 @@ std::optional<std::chrono::nanoseconds> StreamReporter::deadline() const {
 
 std::optional<std::chrono::nanoseconds> StreamReporter::changeDeadline() const {
   if (!held_) return std::nullopt;
-  const std::chrono::nanoseconds longest = held_->firstStep + kLongestHold;
+  const std::chrono::nanoseconds longest = held_->firstStep + kMaxHold;
   const bool waitsForMore = isStart() && !playback_.isComplete();
   return waitsForMore ? longest : std::min(longest, held_->lastStep + kSettleTime);
 }
@@ -80,13 +80,13 @@ std::optional<std::chrono::nanoseconds> StreamReporter::changeDeadline() const {
 void StreamReporter::deadlineReached() {
   const std::chrono::nanoseconds now = clock_.monotonic();
   if (reporterID_ == 0 && now >= deadline()) beginSession();
-  if (held_ && now >= changeDeadline()) tellHeld();
-  if (reporterID_ != 0) tellOverload(overloads_.take(now));
+  if (held_ && now >= changeDeadline()) sendHeldChange();
+  if (reporterID_ != 0) sendOverload(overloads_.take(now));
 }
 
-// What the new state does not know, the playback keeps: a pause takes format and links away, but says nothing
-// about what will be played next, or where.
-void StreamReporter::take(const StreamState& state) {
+// The playback keeps its values where the new state has none: a pause removes the format and the links, but
+// does not say that the next playback will use others.
+void StreamReporter::mergeState(const StreamState& state) {
   playback_.running = state.running;
   if (state.volume) playback_.volume = state.volume;
   if (state.format) playback_.format = state.format;
@@ -97,8 +97,8 @@ void StreamReporter::take(const StreamState& state) {
   role_ = state.role;
 }
 
-void StreamReporter::hold() {
-  const bool differs = told_ ? playback_ != *told_ : playback_.running;
+void StreamReporter::holdChange() {
+  const bool differs = reported_ ? playback_ != *reported_ : playback_.running;
   if (!differs) {
     held_.reset();
     return;
@@ -112,18 +112,18 @@ void StreamReporter::hold() {
   if (!isStart()) held_->time = clock_.now();
 }
 
-void StreamReporter::tellHeld() {
-  if (held_) tell(held_->time);
+void StreamReporter::sendHeldChange() {
+  if (held_) sendState(held_->time);
 }
 
-void StreamReporter::tell(double time) {
+void StreamReporter::sendState(double time) {
   if (reporterID_ == 0) beginSession();
   held_.reset();
-  told_ = playback_;
+  reported_ = playback_;
   sink_.message(reporterID_, kOutputCategory, kGenericType, messageFor(time));
 }
 
-void StreamReporter::tellOverload(const std::optional<Overload>& overload) {
+void StreamReporter::sendOverload(const std::optional<Overload>& overload) {
   if (!overload) return;
   sink_.message(reporterID_, kIOCategory, kErrorType,
                 {{kTimestampKey, overload->time},

@@ -14,8 +14,8 @@
 
 namespace tonewerk {
 
-// Reports one stream: a session that begins when it is known who plays, a message whenever something about
-// the playback has changed, a final message and the session's end when the stream leaves.
+// Reports one stream. The session begins when the application is known. Each change of the playback is sent
+// as a message. When the stream leaves, a final message is sent and the session ends.
 //
 //   stream appears   . . . . . . . .  create, configure, start
 //   runs             at t0            message {t0, running, volume, device, format}
@@ -23,43 +23,45 @@ namespace tonewerk {
 //   pauses           at t4            message {t4, not running, ...}
 //   leaves           at t5            message {t5, not running, ..., session_duration}, stop, destroy
 //
-// Every message is the whole state under one category and type. The daemon drops a message that repeats the
-// newest of its category and type; with the whole state in each, what it drops is exactly what says nothing
-// new. Were starts, stops and volumes told under types of their own, a second start at the old volume would
-// be lost.
+// Every message holds the whole state, and all have the same category and type. The daemon drops a message
+// that repeats the newest one of its category and type. Because each message holds the whole state, the
+// daemon drops exactly those that say nothing new. If starts, stops and volumes had types of their own, a
+// second start at the old volume would be lost.
 //
-// What belongs together arrives apart: the state before the format, the sinks of a move one by one, a drag in
-// steps. A change is therefore held until kSettleTime has passed without another, a start also until volume,
-// device and format are known, both at most kLongestHold. It is told with the time at which it happened: a
-// start that of the start, any other the time of its last step. A pause or an end is told at once, after what
-// was held.
+// Changes that belong together arrive one by one: the running state before the format, the sinks of a move in
+// turn, the steps of a drag. So a change is held until kSettleTime has passed without another. A start is
+// also held until volume, device and format are known. Both are held for at most kMaxHold. A message carries
+// the time of the change: the time of the start for a start, the time of the last step for any other change.
+// A pause or an end is sent at once, after a held change.
 //
-// An overload is told at once, under a category and type of its own; more of them once in a second.
+// An overload is sent at once, under a category and type of its own. Later ones are sent at most once a
+// second.
 //
-// For one thread, on which deadlineReached() is called when deadline() has come.
+// Used on one thread, which calls deadlineReached() when the time deadline() has come.
 class StreamReporter {
  public:
   static constexpr std::chrono::milliseconds kSettleTime{200};
-  static constexpr std::chrono::milliseconds kLongestHold{1000};
+  static constexpr std::chrono::milliseconds kMaxHold{1000};
 
-  // All outlive this.
+  // All arguments outlive this object.
   StreamReporter(SessionSink& sink, const Clock& clock, ReporterIdentifiers& identifiers);
 
   void update(const StreamState& state);
   void overloaded(const Overload& overload);
-  // Nothing said so far has reached a daemon: a new session from the present state.
+  // No message has reached a daemon yet: begins a new session with the present state.
   void restart();
-  // The session is there, but what it was told is lost: the present state again, told as it is now.
-  void retell();
-  // The stream is gone. The last call.
+  // The session exists, but the messages sent to it are lost: sends the present state again, with the present
+  // time.
+  void resend();
+  // The stream is gone: sends the final message and ends the session. No other call may follow.
   void end();
 
-  // Monotonic time; none when nothing is held.
+  // Monotonic time of the next call of deadlineReached(); none when nothing is held.
   std::optional<std::chrono::nanoseconds> deadline() const;
   void deadlineReached();
 
  private:
-  // What a message says besides its time.
+  // A message's content without its time.
   struct Playback {
     bool running = false;
     std::optional<double> volume;
@@ -70,18 +72,18 @@ class StreamReporter {
     friend bool operator==(const Playback&, const Playback&) = default;
   };
   struct HeldChange {
-    double time;  // wall-clock time for its message
+    double time;  // wall-clock time of the message, in seconds since 1970
     std::chrono::nanoseconds firstStep;
     std::chrono::nanoseconds lastStep;
   };
 
   std::optional<std::chrono::nanoseconds> changeDeadline() const;
-  bool isStart() const { return playback_.running && !(told_ && told_->running); }
-  void take(const StreamState& state);
-  void hold();
-  void tellHeld();
-  void tell(double time);
-  void tellOverload(const std::optional<Overload>& overload);
+  bool isStart() const { return playback_.running && !(reported_ && reported_->running); }
+  void mergeState(const StreamState& state);
+  void holdChange();
+  void sendHeldChange();
+  void sendState(double time);
+  void sendOverload(const std::optional<Overload>& overload);
   void beginSession();
   ValueMap messageFor(double time) const;
 
@@ -94,8 +96,8 @@ class StreamReporter {
   bool described_ = false;
   std::string application_;
   std::string role_;
-  Playback playback_;             // as it is, with what was last known of it
-  std::optional<Playback> told_;  // as the session last heard it; none before the first start
+  Playback playback_;  // the present state; a value that is now unknown keeps its last known value
+  std::optional<Playback> reported_;  // the state last sent to the session; none before the first start
   std::optional<HeldChange> held_;
   OverloadPacer overloads_;
 };

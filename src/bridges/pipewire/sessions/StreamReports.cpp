@@ -38,8 +38,8 @@ void StreamReports::restartAll() {
   rearm();
 }
 
-void StreamReports::retellAll() {
-  for (auto& [stream, reporter] : reporters_) reporter.retell();
+void StreamReports::resendAll() {
+  for (auto& [stream, reporter] : reporters_) reporter.resend();
   rearm();
 }
 

@@ -12,10 +12,11 @@
 
 namespace tonewerk {
 
-// One StreamReporter for each stream of the graph, and the one timer they share. For the loop's thread.
+// Keeps one StreamReporter for each stream of the graph, and one timer for all of them. Used on the loop's
+// thread only.
 class StreamReports final : public StreamObserver {
  public:
-  // All outlive this.
+  // All arguments outlive this object.
   StreamReports(SessionSink& sink, const Clock& clock, ReporterIdentifiers& identifiers, EventLoop& loop);
 
   void streamChanged(std::uint32_t stream, const StreamState& state) override;
@@ -24,10 +25,10 @@ class StreamReports final : public StreamObserver {
   // Ignored when there is no such stream.
   void streamOverloaded(std::uint32_t stream, const Overload& overload);
 
-  // Nothing said so far has reached a daemon: every stream's session begins anew.
+  // No message has reached a daemon yet: begins a new session for every stream.
   void restartAll();
-  // The sessions are there, but what they were told is lost: every stream tells how it plays.
-  void retellAll();
+  // The sessions exist, but the messages sent to them are lost: sends the present state of every stream.
+  void resendAll();
 
  private:
   void deadlinesReached();

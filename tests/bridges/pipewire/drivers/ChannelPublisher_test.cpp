@@ -8,7 +8,7 @@
 #include <sstream>
 
 #include "bridges/pipewire/drivers/PublishingSessionSink.h"
-#include "bridges/pipewire/sessions/Said.h"
+#include "bridges/pipewire/sessions/ConsoleOutput.h"
 #include "support/TemporaryDirectory.h"
 #include "support/manual/ManualEventLoop.h"
 #include "values/Value.h"
@@ -34,8 +34,8 @@ class ChannelPublisherTest : public ::testing::Test {
   }
 
   const TemporaryDirectory directory;
-  Said said;
-  Console console{false, said.file()};
+  ConsoleOutput output;
+  Console console{false, output.file()};
   ManualClock clock;
   ManualEventLoop loop{clock};
   std::int64_t value = 1;
@@ -52,10 +52,10 @@ TEST_F(ChannelPublisherTest, WritesNothingBeforeItIsOpened) {
 TEST_F(ChannelPublisherTest, PublishesWhenItIsOpened) {
   publisher.open(directory.path());
   EXPECT_EQ(published(), "{\"value\":1}\n");
-  EXPECT_EQ(said.text(), "");
+  EXPECT_EQ(output.text(), "");
 }
 
-TEST_F(ChannelPublisherTest, ReplacesWhatADeadProcessLeftBehind) {
+TEST_F(ChannelPublisherTest, ReplacesTheFileOfADeadProcess) {
   std::filesystem::create_directory(directory.path("channels"));
   std::ofstream(file(directory.path())) << "{\"value\": 77, \"half";
   std::ofstream(file(directory.path()) + ".new") << "rest";
@@ -94,8 +94,8 @@ TEST_F(ChannelPublisherTest, LeavesTheFileAloneWhenNothingChanged) {
   EXPECT_EQ(published(), "{\"value\":2}\n");
 }
 
-// A service's runtime directory goes with the service.
-TEST_F(ChannelPublisherTest, WritesAgainForADaemonThatIsBackWithAnEmptyDirectory) {
+// The service manager removes the runtime directory when the service stops.
+TEST_F(ChannelPublisherTest, WritesAgainForARestartedDaemonWithAnEmptyDirectory) {
   publisher.open(directory.path());
   std::filesystem::remove_all(directory.path("channels"));
   publisher.open(directory.path());
@@ -111,7 +111,7 @@ TEST_F(ChannelPublisherTest, FollowsADaemonToAnotherDirectory) {
   EXPECT_EQ(textOf(file(other)), "{\"value\":1}\n");
 }
 
-TEST_F(ChannelPublisherTest, RemovesTheFileAtTheEndAndWritesNoMore) {
+TEST_F(ChannelPublisherTest, RemovesTheFileAndWritesNoMoreAfterWithdraw) {
   publisher.open(directory.path());
   value = 2;
   publisher.changed();
@@ -123,13 +123,13 @@ TEST_F(ChannelPublisherTest, RemovesTheFileAtTheEndAndWritesNoMore) {
   EXPECT_EQ(published(), "no file");
 }
 
-TEST_F(ChannelPublisherTest, SaysOnceThatItCannotWriteAndTriesOn) {
+TEST_F(ChannelPublisherTest, ReportsAFailureOnceAndTriesAgain) {
   const std::string runtime = directory.path("later");
   publisher.open(runtime);
   value = 2;
   publisher.publish();
-  EXPECT_EQ(countOf(said.text(), "cannot publish driver channels in " + runtime + "/channels"), 1);
-  EXPECT_THAT(said.text(), HasSubstr("No such file or directory"));
+  EXPECT_EQ(countOf(output.text(), "cannot publish driver channels in " + runtime + "/channels"), 1);
+  EXPECT_THAT(output.text(), HasSubstr("No such file or directory"));
   std::filesystem::create_directory(runtime);
   publisher.publish();
   EXPECT_EQ(textOf(file(runtime)), "{\"value\":2}\n");
@@ -137,10 +137,10 @@ TEST_F(ChannelPublisherTest, SaysOnceThatItCannotWriteAndTriesOn) {
   std::filesystem::remove_all(runtime);
   value = 3;
   publisher.publish();
-  EXPECT_EQ(countOf(said.text(), "cannot publish"), 2);
+  EXPECT_EQ(countOf(output.text(), "cannot publish"), 2);
 }
 
-// Notes what a reader of the file sees at each call.
+// Records the content of the file at each call.
 class ReadingSink final : public SessionSink {
  public:
   explicit ReadingSink(std::function<std::string()> read) : read_(std::move(read)) {}

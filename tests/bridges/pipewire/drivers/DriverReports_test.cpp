@@ -17,7 +17,7 @@ using std::chrono::milliseconds;
 using ::testing::IsEmpty;
 using ::testing::SizeIs;
 
-// A sink that drives two streams, each with a session.
+// Has a sink that drives two streams, each with a session.
 class DriverReportsTest : public ::testing::Test {
  protected:
   static constexpr std::uint32_t kSpeaker = 36;
@@ -40,7 +40,7 @@ class DriverReportsTest : public ::testing::Test {
     model.nodeDescribed(node, true, {{std::string(kNodeDriverKey), "true"}});
   }
 
-  // A cycle in which nobody is late, 100 ms ago.
+  // A cycle 100 ms ago in which no node is late.
   ProfiledCycle cycle() {
     ProfiledCycle cycle;
     cycle.driver = kSpeaker;
@@ -54,14 +54,14 @@ class DriverReportsTest : public ::testing::Test {
     cycle.followers = {{kFirst, true, {}}, {kSecond, true, {}}};
     return cycle;
   }
-  ProfiledCycle cycleWithoutTheFirst() {
+  ProfiledCycle cycleWithLateFirst() {
     ProfiledCycle late = cycle();
     late.followers[0].hasFinished = false;
     return late;
   }
   void run() { drivers.profiled({cycle()}); }
 
-  // The overloads that a stream's session heard of.
+  // The overloads that were reported to a stream's session.
   std::vector<ValueMap> overloads(std::size_t session) const {
     std::vector<ValueMap> found;
     for (const MemorySessionSink::Message& message : sink.sessions.at(session).messages) {
@@ -96,8 +96,8 @@ class DriverReportsTest : public ::testing::Test {
   std::uint32_t driverXruns = 0;
 };
 
-TEST_F(DriverReportsTest, TellsAStreamThatIsLateAndNoOther) {
-  drivers.profiled({cycleWithoutTheFirst()});
+TEST_F(DriverReportsTest, ReportsAnOverloadToTheLateStreamOnly) {
+  drivers.profiled({cycleWithLateFirst()});
   ASSERT_THAT(overloads(0), SizeIs(1));
   const ValueMap overload = overloads(0)[0];
   EXPECT_EQ(overload.text("issue_type"), "overload");
@@ -108,7 +108,7 @@ TEST_F(DriverReportsTest, TellsAStreamThatIsLateAndNoOther) {
   EXPECT_THAT(overloads(1), IsEmpty());
 }
 
-TEST_F(DriverReportsTest, TellsEveryStreamThatADriverServesOfItsXruns) {
+TEST_F(DriverReportsTest, ReportsADriversXrunsToEveryStreamItServes) {
   driverXruns = 2;
   run();
   ASSERT_THAT(overloads(0), SizeIs(1));
@@ -116,26 +116,26 @@ TEST_F(DriverReportsTest, TellsEveryStreamThatADriverServesOfItsXruns) {
   EXPECT_EQ(overloads(1)[0].integer("xrun_count"), 2);
 }
 
-TEST_F(DriverReportsTest, TellsWhatHappenedInOneProfileAtOnce) {
-  drivers.profiled({cycleWithoutTheFirst(), cycle(), cycleWithoutTheFirst()});
+TEST_F(DriverReportsTest, AddsUpTheOverloadsOfOneProfile) {
+  drivers.profiled({cycleWithLateFirst(), cycle(), cycleWithLateFirst()});
   ASSERT_THAT(overloads(0), SizeIs(1));
   EXPECT_EQ(overloads(0)[0].integer("xrun_count"), 2);
   EXPECT_EQ(overloads(0)[0].integer("io_cycle"), 4);
 }
 
-TEST_F(DriverReportsTest, SaysNothingWhenNobodyIsLate) {
+TEST_F(DriverReportsTest, ReportsNothingWhenNoNodeIsLate) {
   run();
   run();
   EXPECT_THAT(overloads(0), IsEmpty());
 }
 
-TEST_F(DriverReportsTest, TakesATimeThatCannotBeForNow) {
-  ProfiledCycle future = cycleWithoutTheFirst();
+TEST_F(DriverReportsTest, UsesThePresentTimeInPlaceOfAnImpossibleOne) {
+  ProfiledCycle future = cycleWithLateFirst();
   future.begin = clock.monotonic() + milliseconds(1);
   drivers.profiled({future});
   EXPECT_EQ(overloads(0).at(0).number("twreporting_timestamp"), clock.now());
   clock.advance(60.0);
-  ProfiledCycle ancient = cycleWithoutTheFirst();
+  ProfiledCycle ancient = cycleWithLateFirst();
   ancient.begin = milliseconds(1);
   drivers.profiled({ancient});
   EXPECT_EQ(overloads(0).at(1).number("twreporting_timestamp"), clock.now());
@@ -154,7 +154,7 @@ TEST_F(DriverReportsTest, CountsTheCyclesOfDriversThatAreSinksOrSources) {
   EXPECT_EQ(cyclesOf("speaker"), 2);
 }
 
-TEST_F(DriverReportsTest, PublishesWhatIsNew) {
+TEST_F(DriverReportsTest, PublishesNewDriversAndCycles) {
   publisher.open(directory.path());
   const std::string file = directory.path("channels/graph.json");
   const std::uintmax_t before = std::filesystem::file_size(file);
@@ -168,8 +168,8 @@ TEST_F(DriverReportsTest, PublishesWhatIsNew) {
   EXPECT_TRUE(std::filesystem::exists(file));
 }
 
-// The graph numbers its nodes anew after a restart.
-TEST_F(DriverReportsTest, TakesANewDriversCountForNoXruns) {
+// The graph numbers its nodes again from the start after a restart.
+TEST_F(DriverReportsTest, DoesNotReportTheEarlierXrunsOfANewDriver) {
   driverXruns = 3;
   model.removed(kSpeaker);
   addDriver(kSpeaker, "Audio/Sink", "headset");

@@ -26,7 +26,7 @@ class DriverStatisticsTest : public ::testing::Test {
     list = content.find("channels");
     return list == nullptr || list->asArray() == nullptr ? ValueArray() : *list->asArray();
   }
-  // "Tx//Cycles", "Rx/microphone/Period".
+  // Names such as "Tx//Cycles" and "Rx/microphone/Period": group, subgroup, channel.
   std::vector<std::string> names() const {
     std::vector<std::string> names;
     for (const Value& channel : channels()) names.push_back(nameOf(*channel.asMap()));
@@ -39,7 +39,7 @@ class DriverStatisticsTest : public ::testing::Test {
     return {};
   }
   std::int64_t value(const std::string& name) const { return channel(name).integer("value"); }
-  // "20-30:1 100-125:2": the buckets that have hits.
+  // The buckets that have hits, such as "20-30:1 100-125:2".
   std::string hits(const std::string& name) const {
     std::string text;
     const ValueMap map = channel(name);
@@ -106,7 +106,7 @@ TEST_F(DriverStatisticsTest, CountsACycleForItsDriverAndItsDirection) {
   EXPECT_EQ(channel("Tx/speaker/Processing Time").integer("max"), 25);
 }
 
-TEST_F(DriverStatisticsTest, PutsProcessingTimesInThePerCentOfThePeriodThatTheyTook) {
+TEST_F(DriverStatisticsTest, CountsProcessingTimesAsPercentOfThePeriod) {
   statistics.setPresent({speaker});
   process(microseconds(0));
   process(microseconds(999));
@@ -120,7 +120,7 @@ TEST_F(DriverStatisticsTest, PutsProcessingTimesInThePerCentOfThePeriodThatTheyT
   EXPECT_EQ(channel("Tx/speaker/Processing Time").integer("max"), 100'000);
 }
 
-TEST_F(DriverStatisticsTest, CountsACycleWithoutTimesAsACycle) {
+TEST_F(DriverStatisticsTest, CountsACycleWithoutTimes) {
   statistics.setPresent({speaker});
   cycle.processing.reset();
   statistics.count(speaker, cycle, {});
@@ -136,7 +136,7 @@ TEST_F(DriverStatisticsTest, CountsXrunsAndTheCyclesThatFollowersLeftUnfinished)
   EXPECT_EQ(value("Tx/speaker/Cycles"), 1);
 }
 
-TEST_F(DriverStatisticsTest, CountsOfACycleToldAgainOnlyWhatIsNew) {
+TEST_F(DriverStatisticsTest, CountsOnlyNewXrunsOfARepeatedCycle) {
   statistics.setPresent({speaker});
   statistics.count(speaker, cycle, {.isRepeat = true, .driver = 1, .followers = {}});
   EXPECT_EQ(value("Tx/speaker/Xruns"), 1);
@@ -144,7 +144,7 @@ TEST_F(DriverStatisticsTest, CountsOfACycleToldAgainOnlyWhatIsNew) {
   EXPECT_EQ(hits("Tx/speaker/Period"), "");
 }
 
-TEST_F(DriverStatisticsTest, GoesOnCountingForADriverThatComesBack) {
+TEST_F(DriverStatisticsTest, ContinuesCountingForADriverThatComesBack) {
   statistics.setPresent({speaker});
   statistics.count(speaker, cycle, {});
   statistics.setPresent({});
@@ -154,7 +154,7 @@ TEST_F(DriverStatisticsTest, GoesOnCountingForADriverThatComesBack) {
   EXPECT_EQ(value("Tx/speaker/Cycles"), 2);
 }
 
-TEST_F(DriverStatisticsTest, HasRoomForSoManyDriversAndCountsTheOthersByDirection) {
+TEST_F(DriverStatisticsTest, HasChannelsForAMaximumOfDriversAndCountsOthersByDirection) {
   std::set<DriverNode> drivers;
   for (std::size_t i = 0; i < DriverStatistics::kMaxDrivers; ++i) {
     drivers.insert({DriverNode::kSink, "a" + std::to_string(i)});
@@ -169,7 +169,7 @@ TEST_F(DriverStatisticsTest, HasRoomForSoManyDriversAndCountsTheOthersByDirectio
   EXPECT_THAT(channel("Tx/speaker/Cycles"), IsEmpty());
   EXPECT_EQ(value("Tx//Cycles"), 1);
 
-  // One that left makes room.
+  // A driver that left gives its place to a new one.
   drivers.erase({DriverNode::kSink, "a0"});
   statistics.setPresent(drivers);
   EXPECT_THAT(channel("Tx/a0/Cycles"), IsEmpty());

@@ -16,19 +16,19 @@ constexpr std::uint32_t kStream = 42;
 
 class XrunWatchTest : public ::testing::Test {
  protected:
-  // The driver's next cycle.
+  // Reports the driver's next cycle.
   CycleXruns next(std::vector<ProfiledFollower> followers, std::uint32_t driverXruns = 0) {
     position += 1024;
     return again(std::move(followers), driverXruns);
   }
-  // The same one, told once more.
+  // Reports the same cycle again.
   CycleXruns again(std::vector<ProfiledFollower> followers, std::uint32_t driverXruns = 0) {
     ProfiledCycle cycle;
     cycle.driver = kDriver;
     cycle.position = position;
     cycle.xruns = driverXruns;
     cycle.followers = std::move(followers);
-    return watch.judge(cycle);
+    return watch.update(cycle);
   }
 
   static ProfiledFollower finished(std::uint32_t node = kStream) { return {node, true, std::nullopt}; }
@@ -48,7 +48,7 @@ TEST_F(XrunWatchTest, CountsACycleThatAFollowerLeftUnfinished) {
   EXPECT_THAT(next({finished()}).followers, IsEmpty());
 }
 
-TEST_F(XrunWatchTest, CountsACycleThatIsToldTwiceOnce) {
+TEST_F(XrunWatchTest, CountsACycleThatIsReportedTwiceOnce) {
   next({finished()});
   EXPECT_FALSE(next({unfinished()}).isRepeat);
   const CycleXruns repeated = again({unfinished()});
@@ -56,13 +56,13 @@ TEST_F(XrunWatchTest, CountsACycleThatIsToldTwiceOnce) {
   EXPECT_THAT(repeated.followers, IsEmpty());
 }
 
-// Some drivers' clocks do not count.
-TEST_F(XrunWatchTest, TakesNoCycleForARepeatAfterOneThatWasFinished) {
+// The clocks of some drivers do not advance.
+TEST_F(XrunWatchTest, FindsNoRepeatAfterAFinishedCycle) {
   next({finished()});
   EXPECT_FALSE(again({finished()}).isRepeat);
 }
 
-TEST_F(XrunWatchTest, TakesAFollowerThatIsBeingStartedForNoLateOne) {
+TEST_F(XrunWatchTest, DoesNotCountAFollowerThatIsBeingStarted) {
   EXPECT_THAT(next({unfinished()}).followers, IsEmpty());
   EXPECT_THAT(next({unfinished()}).followers, IsEmpty());
   next({finished()});
@@ -75,22 +75,22 @@ TEST_F(XrunWatchTest, ForgetsAFollowerThatLeft) {
   EXPECT_THAT(next({unfinished()}).followers, IsEmpty());
 }
 
-TEST_F(XrunWatchTest, TrustsTheCountOfAFollowerThatHasOne) {
+TEST_F(XrunWatchTest, UsesTheCountOfAFollowerThatHasOne) {
   EXPECT_THAT(next({counting(7)}).followers, IsEmpty());
   EXPECT_THAT(next({counting(7, false)}).followers, IsEmpty());
   EXPECT_THAT(next({counting(9)}).followers, ElementsAre(Pair(kStream, 2)));
-  // It was made anew.
+  // The count went back: the node was made again.
   EXPECT_THAT(next({counting(1)}).followers, ElementsAre(Pair(kStream, 1)));
 }
 
-TEST_F(XrunWatchTest, CountsWhatTheDriversOwnCountRisesBy) {
+TEST_F(XrunWatchTest, CountsTheIncreaseOfTheDriversOwnCount) {
   EXPECT_EQ(next({}, 5).driver, 0U);
   EXPECT_EQ(next({}, 5).driver, 0U);
   EXPECT_EQ(next({}, 8).driver, 3U);
   EXPECT_EQ(next({}, 2).driver, 2U);
 }
 
-TEST_F(XrunWatchTest, TakesADriverThatReplacesAnotherForANewOne) {
+TEST_F(XrunWatchTest, StartsAgainForADriverThatReplacesAnother) {
   next({finished()}, 1);
   watch.retain({});
   EXPECT_EQ(next({unfinished()}, 9).driver, 0U);
@@ -98,17 +98,17 @@ TEST_F(XrunWatchTest, TakesADriverThatReplacesAnotherForANewOne) {
   EXPECT_EQ(next({}, 10).driver, 1U);
 }
 
-TEST_F(XrunWatchTest, KeepsNoMoreDriversThanThereCanBe) {
+TEST_F(XrunWatchTest, KeepsAtMostTheMaximumOfDrivers) {
   next({}, 1);
   ProfiledCycle other;
   for (std::uint32_t i = 1; i < XrunWatch::kMaxDrivers; ++i) {
     other.driver = 1000 + i;
-    watch.judge(other);
+    watch.update(other);
   }
   EXPECT_EQ(next({}, 2).driver, 1U);
   other.driver = 999;
-  watch.judge(other);
-  // What was known of the others is gone, and with it what their counts were.
+  watch.update(other);
+  // All drivers were forgotten, so the first count of each is not an increase.
   EXPECT_EQ(next({}, 3).driver, 0U);
   EXPECT_EQ(next({}, 4).driver, 1U);
 }

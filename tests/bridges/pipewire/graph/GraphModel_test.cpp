@@ -57,7 +57,7 @@ class GraphModelTest : public ::testing::Test {
   GraphModel model{observer};
 };
 
-TEST_F(GraphModelTest, TellsOfOutputStreamsOnly) {
+TEST_F(GraphModelTest, ReportsOutputStreamsOnly) {
   addStream();
   addSink(kSpeaker, "Speaker");
   model.nodeAppeared(60, properties({{kMediaClassKey, "Stream/Input/Audio"}}));
@@ -65,7 +65,7 @@ TEST_F(GraphModelTest, TellsOfOutputStreamsOnly) {
   EXPECT_TRUE(observer.states.contains(kStream));
 }
 
-TEST_F(GraphModelTest, KnowsWhoPlaysWhenNodeAndClientHaveSpokenInEitherOrder) {
+TEST_F(GraphModelTest, KnowsTheApplicationOnceNodeAndClientAreDescribedInEitherOrder) {
   for (const bool clientFirst : {true, false}) {
     model.clear();
     model.complete();
@@ -81,7 +81,7 @@ TEST_F(GraphModelTest, KnowsWhoPlaysWhenNodeAndClientHaveSpokenInEitherOrder) {
   }
 }
 
-TEST_F(GraphModelTest, WaitsForNoClientWhereThereIsNone) {
+TEST_F(GraphModelTest, DescribesAStreamWithoutAClientAtOnce) {
   model.nodeAppeared(kStream, properties({{kMediaClassKey, "Stream/Output/Audio"}, {kNodeNameKey, "tone"}}));
   model.nodeDescribed(kStream, true, {});
   EXPECT_TRUE(stream().described);
@@ -89,7 +89,7 @@ TEST_F(GraphModelTest, WaitsForNoClientWhereThereIsNone) {
   EXPECT_EQ(stream().application, "tone");
 }
 
-TEST_F(GraphModelTest, NamesTheSinkThatTheLinksLeadTo) {
+TEST_F(GraphModelTest, NamesTheSinksThatAStreamIsLinkedTo) {
   addStream();
   addSink(kSpeaker, "Speaker");
   addSink(kHeadset, "Headset");
@@ -106,7 +106,7 @@ TEST_F(GraphModelTest, NamesTheSinkThatTheLinksLeadTo) {
   EXPECT_EQ(stream().device, "");
 }
 
-TEST_F(GraphModelTest, NamesASinkThatComesAfterItsLink) {
+TEST_F(GraphModelTest, NamesASinkThatAppearsAfterItsLink) {
   addStream();
   model.linkAppeared(70, kStream, kSpeaker);
   EXPECT_EQ(stream().device, "");
@@ -116,7 +116,7 @@ TEST_F(GraphModelTest, NamesASinkThatComesAfterItsLink) {
   EXPECT_EQ(stream().device, "Kitchen");
 }
 
-TEST_F(GraphModelTest, TakesNoRecorderForADevice) {
+TEST_F(GraphModelTest, DoesNotNameARecorderAsADevice) {
   addStream();
   model.nodeAppeared(60,
                      properties({{kMediaClassKey, "Stream/Input/Audio"}, {kNodeDescriptionKey, "Recorder"}}));
@@ -139,7 +139,7 @@ TEST_F(GraphModelTest, FollowsVolumeAndFormat) {
   EXPECT_EQ(stream().format, format);
 }
 
-TEST_F(GraphModelTest, SaysNothingTwice) {
+TEST_F(GraphModelTest, ReportsNoStateTwice) {
   addStream();
   model.nodeDescribed(kStream, true, {});
   const int before = observer.changes;
@@ -149,7 +149,7 @@ TEST_F(GraphModelTest, SaysNothingTwice) {
   EXPECT_EQ(observer.changes, before);
 }
 
-TEST_F(GraphModelTest, TellsWhenAStreamLeavesAndForgetsIt) {
+TEST_F(GraphModelTest, ReportsThatAStreamLeftAndForgetsIt) {
   addStream();
   model.linkAppeared(70, kStream, kSpeaker);
   model.removed(kStream);
@@ -162,7 +162,7 @@ TEST_F(GraphModelTest, TellsWhenAStreamLeavesAndForgetsIt) {
   EXPECT_EQ(observer.gone.size(), 1U);
 }
 
-TEST_F(GraphModelTest, EndsEveryStreamWhenTheGraphGoes) {
+TEST_F(GraphModelTest, ReportsAllStreamsGoneWhenTheGraphIsCleared) {
   addStream();
   addSink(kSpeaker, "Speaker");
   model.nodeAppeared(41, properties({{kMediaClassKey, "Stream/Output/Audio"}}));
@@ -172,8 +172,9 @@ TEST_F(GraphModelTest, EndsEveryStreamWhenTheGraphGoes) {
   EXPECT_THAT(observer.states, IsEmpty());
 }
 
-// What plays when the bridge comes may be listed before its device: the first message once lacked it.
-TEST_F(GraphModelTest, TellsOfNoStreamUntilTheGraphHasBeenDescribed) {
+// A stream that plays when the bridge starts may be listed before its device. Its first message once lacked
+// the device.
+TEST_F(GraphModelTest, ReportsNoStreamUntilTheGraphHasBeenDescribed) {
   model.clear();
   addStream();
   model.nodeDescribed(kStream, true, {});
@@ -185,7 +186,7 @@ TEST_F(GraphModelTest, TellsOfNoStreamUntilTheGraphHasBeenDescribed) {
   EXPECT_EQ(stream().device, "Speaker");
 }
 
-TEST_F(GraphModelTest, TellsOfNoStreamThatLeftBeforeTheGraphWasDescribed) {
+TEST_F(GraphModelTest, ReportsNoStreamThatLeftBeforeTheGraphWasDescribed) {
   model.clear();
   addStream();
   model.removed(kStream);
@@ -194,7 +195,7 @@ TEST_F(GraphModelTest, TellsOfNoStreamThatLeftBeforeTheGraphWasDescribed) {
   EXPECT_THAT(observer.gone, IsEmpty());
 }
 
-TEST_F(GraphModelTest, KnowsTheSinksAndSourcesThatDriveOthers) {
+TEST_F(GraphModelTest, ListsTheSinksAndSourcesThatDriveOthers) {
   const auto add = [&](std::uint32_t node, const char* mediaClass, const char* driver) {
     const std::string name = "node-" + std::to_string(node);
     model.nodeAppeared(node, properties({{kMediaClassKey, mediaClass}, {kNodeNameKey, name.c_str()}}));
@@ -216,7 +217,7 @@ TEST_F(GraphModelTest, KnowsTheSinksAndSourcesThatDriveOthers) {
   EXPECT_EQ(model.driverAt(99), std::nullopt);
 }
 
-TEST_F(GraphModelTest, SaysWhenItsDriversMayDiffer) {
+TEST_F(GraphModelTest, NotifiesWhenItsDriversMayHaveChanged) {
   int changes = 0;
   model.watchDrivers([&] { ++changes; });
   addStream();
@@ -224,7 +225,7 @@ TEST_F(GraphModelTest, SaysWhenItsDriversMayDiffer) {
   EXPECT_EQ(changes, 0);
   model.nodeDescribed(kSpeaker, true, properties({{kNodeDriverKey, "true"}}));
   EXPECT_EQ(changes, 1);
-  // Without a name of its own it goes by what people call it.
+  // A driver without a node name is named by its description.
   EXPECT_EQ(model.driverAt(kSpeaker)->name, "Speaker");
   model.removed(kStream);
   EXPECT_EQ(changes, 1);
@@ -235,7 +236,7 @@ TEST_F(GraphModelTest, SaysWhenItsDriversMayDiffer) {
   EXPECT_EQ(changes, 3);
 }
 
-TEST_F(GraphModelTest, ShortensWhatTheGraphSays) {
+TEST_F(GraphModelTest, ShortensTextsOfTheGraph) {
   addStream();
   const std::string endless(1'000'000, 'x');
   model.clientDescribed(kClient, {{std::string(kApplicationIDKey), endless}});

@@ -20,16 +20,16 @@ struct Library {
 class PipeWireLoopTest : public ::testing::Test {
  protected:
   PipeWireLoopTest() {
-    patience = loop->makeTimer([this] {
+    timeout = loop->makeTimer([this] {
       ADD_FAILURE() << "nothing came";
       loop->quit();
     });
-    patience->arm(std::chrono::seconds(20));
+    timeout->arm(std::chrono::seconds(20));
   }
 
   Library library;
   std::unique_ptr<PipeWireLoop> loop = PipeWireLoop::make();
-  std::unique_ptr<EventLoop::Timer> patience;
+  std::unique_ptr<EventLoop::Timer> timeout;
 };
 
 TEST_F(PipeWireLoopTest, RunsATimerOnceForEachArming) {
@@ -43,7 +43,7 @@ TEST_F(PipeWireLoopTest, RunsATimerOnceForEachArming) {
   EXPECT_EQ(expired, 3);
 }
 
-TEST_F(PipeWireLoopTest, RunsNoTimerThatWasDisarmedOrDestroyed) {
+TEST_F(PipeWireLoopTest, DoesNotRunADisarmedOrDestroyedTimer) {
   const auto unwanted = [] { FAIL() << "this timer was stopped"; };
   std::unique_ptr<EventLoop::Timer> disarmed = loop->makeTimer(unwanted);
   std::unique_ptr<EventLoop::Timer> destroyed = loop->makeTimer(unwanted);
@@ -56,7 +56,7 @@ TEST_F(PipeWireLoopTest, RunsNoTimerThatWasDisarmedOrDestroyed) {
   loop->run();
 }
 
-TEST_F(PipeWireLoopTest, WatchesADescriptorUntilItsSourceDiesInItsOwnCallback) {
+TEST_F(PipeWireLoopTest, StopsWatchingWhenASourceIsDestroyedInItsOwnCallback) {
   std::array<int, 2> ends{};
   ASSERT_EQ(pipe(ends.data()), 0);
   int calls = 0;
@@ -75,7 +75,7 @@ TEST_F(PipeWireLoopTest, WatchesADescriptorUntilItsSourceDiesInItsOwnCallback) {
   close(ends[1]);
 }
 
-TEST_F(PipeWireLoopTest, SaysWhenADescriptorsPeerIsGone) {
+TEST_F(PipeWireLoopTest, RunsTheCallbackWhenADescriptorsPeerIsGone) {
   std::array<int, 2> ends{};
   ASSERT_EQ(pipe(ends.data()), 0);
   const std::unique_ptr<EventLoop::Source> source = loop->watch(ends[0], [this] { loop->quit(); });
@@ -85,11 +85,11 @@ TEST_F(PipeWireLoopTest, SaysWhenADescriptorsPeerIsGone) {
   close(ends[0]);
 }
 
-TEST_F(PipeWireLoopTest, RefusesADescriptorThatIsNone) {
+TEST_F(PipeWireLoopTest, RefusesAnInvalidDescriptor) {
   EXPECT_EQ(loop->watch(-1, [] {}), nullptr);
 }
 
-TEST_F(PipeWireLoopTest, TakesASignal) {
+TEST_F(PipeWireLoopTest, RunsTheCallbackForASignal) {
   const std::unique_ptr<EventLoop::Source> source = loop->watchSignal(SIGUSR1, [this] { loop->quit(); });
   ASSERT_NE(source, nullptr);
   ASSERT_EQ(kill(getpid(), SIGUSR1), 0);

@@ -14,7 +14,7 @@ namespace {
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 
-// Room for one pod, and what builds it.
+// Builds one pod in a buffer of its own.
 class PodMaker {
  public:
   PodMaker() { spa_pod_builder_init(&builder_, bytes_.data(), kRoom); }
@@ -62,8 +62,8 @@ TEST(PipeWireParams, ReadsAPlainFormat) {
   EXPECT_EQ(formatOf(maker.close()), (AudioFormat{"lpcm", "S16LE", 44'100, 6}));
 }
 
-// PipeWire hands out the formats of some streams so; they were once taken for streams without a rate.
-TEST(PipeWireParams, ReadsAFormatWhoseValuesAreChoicesOfOne) {
+// PipeWire gives the formats of some streams in this form. They were once read as formats without a rate.
+TEST(PipeWireParams, ReadsAFormatWhoseValuesAreChoicesOfOneValue) {
   FormatMaker maker(SPA_MEDIA_TYPE_audio, SPA_MEDIA_SUBTYPE_raw);
   const auto asChoice = [&](std::uint32_t key, auto add) {
     spa_pod_builder* builder = maker.property(key);
@@ -79,13 +79,13 @@ TEST(PipeWireParams, ReadsAFormatWhoseValuesAreChoicesOfOne) {
   EXPECT_EQ(formatOf(maker.close()), (AudioFormat{"lpcm", "S16LE", 48'000, 2}));
 }
 
-TEST(PipeWireParams, ReadsAPackedFormat) {
+TEST(PipeWireParams, ReadsAnEncodedFormat) {
   FormatMaker maker(SPA_MEDIA_TYPE_audio, SPA_MEDIA_SUBTYPE_iec958);
   maker.rate(48'000);
   EXPECT_EQ(formatOf(maker.close()), (AudioFormat{"iec958", "", 48'000, 0}));
 }
 
-TEST(PipeWireParams, TakesNoFormatThatIsNoSoundOrSaysTooLittle) {
+TEST(PipeWireParams, RefusesAFormatThatIsNotAudioOrLacksRateOrEncoding) {
   FormatMaker video(SPA_MEDIA_TYPE_video, SPA_MEDIA_SUBTYPE_raw);
   EXPECT_EQ(formatOf(video.rate(1).close()), std::nullopt);
   FormatMaker rateless(SPA_MEDIA_TYPE_audio, SPA_MEDIA_SUBTYPE_raw);
@@ -110,7 +110,7 @@ TEST(PipeWireParams, ReadsVolumesAndMute) {
   EXPECT_THAT(volume.channels, ElementsAre(0.25, 0.125));
 }
 
-TEST(PipeWireParams, LeavesOutWhatPropertiesDoNotSay) {
+TEST(PipeWireParams, LeavesOutMissingOrWrongProperties) {
   PodMaker maker;
   maker.open(SPA_TYPE_OBJECT_Props, SPA_PARAM_Props);
   spa_pod_builder_string(maker.property(SPA_PROP_mute), "neither");
@@ -120,7 +120,7 @@ TEST(PipeWireParams, LeavesOutWhatPropertiesDoNotSay) {
   EXPECT_THAT(volume.channels, IsEmpty());
 }
 
-TEST(PipeWireParams, ReadsNoMoreChannelsThanThereCanBe) {
+TEST(PipeWireParams, ReadsAtMostTheMaximumOfChannels) {
   PodMaker maker;
   maker.open(SPA_TYPE_OBJECT_Props, SPA_PARAM_Props);
   const std::array<float, 200> channels{};

@@ -17,7 +17,7 @@ using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 using ::testing::SizeIs;
 
-// What a profiler tells: a structure of objects, one for each cycle.
+// Builds a profiler's report: a structure of objects, one for each cycle.
 class ProfileMaker {
  public:
   ProfileMaker() {
@@ -86,7 +86,7 @@ class ProfileMaker {
   }
   ProfileMaker& driver(const Node& block) { return node(SPA_PROFILER_driverBlock, block); }
   ProfileMaker& follower(const Node& block) { return node(SPA_PROFILER_followerBlock, block); }
-  // Something that a later release may add.
+  // A part that a later release may add.
   ProfileMaker& unknownPart() {
     spa_pod_builder_prop(&builder_, SPA_PROFILER_START_CUSTOM + 1, 0);
     spa_pod_builder_string(&builder_, "news");
@@ -141,7 +141,7 @@ TEST(PipeWireProfile, ReadsTheCyclesOfSeveralDriversInTheirOrder) {
   EXPECT_THAT(drivers, ElementsAre(36, 50, 36));
 }
 
-TEST(PipeWireProfile, KnowsNoTimesOfACycleThatWasUnderWayWhenTheProfilerBegan) {
+TEST(PipeWireProfile, HasNoTimesForACycleThatBeganBeforeTheProfiler) {
   ProfileMaker maker;
   maker.cycle({}, {.signal = 0, .finish = 11'884'633'242'569});
   const std::vector<ProfiledCycle> cycles = maker.cycles();
@@ -150,7 +150,7 @@ TEST(PipeWireProfile, KnowsNoTimesOfACycleThatWasUnderWayWhenTheProfilerBegan) {
   EXPECT_EQ(cycles[0].processing, std::nullopt);
 }
 
-TEST(PipeWireProfile, KnowsNoProcessingTimeThatCannotBe) {
+TEST(PipeWireProfile, HasNoProcessingTimeThatIsImpossible) {
   ProfileMaker maker;
   maker.cycle({}, {.signal = 2'000, .finish = 1'000});
   maker.cycle({}, {.signal = 1, .finish = std::numeric_limits<std::int64_t>::max()});
@@ -162,8 +162,8 @@ TEST(PipeWireProfile, KnowsNoProcessingTimeThatCannotBe) {
   }
 }
 
-// The numbers come out of memory that clients write to.
-TEST(PipeWireProfile, TakesNoCycleWithAClockThatCannotBe) {
+// Clients can write to the memory that these numbers come from.
+TEST(PipeWireProfile, LeavesOutACycleWithAnImpossibleClock) {
   constexpr std::int64_t kEndless = std::numeric_limits<std::int64_t>::max();
   constexpr std::uint32_t kHuge = std::numeric_limits<std::uint32_t>::max();
   for (const ProfileMaker::Clock& clock :
@@ -177,7 +177,7 @@ TEST(PipeWireProfile, TakesNoCycleWithAClockThatCannotBe) {
   }
 }
 
-TEST(PipeWireProfile, TakesNoCycleThatLacksAPart) {
+TEST(PipeWireProfile, LeavesOutACycleThatLacksAPart) {
   ProfileMaker noInfo;
   EXPECT_THAT(noInfo.beginCycle().clock({}).driver({}).endCycle().cycles(), IsEmpty());
   ProfileMaker noClock;
@@ -186,7 +186,7 @@ TEST(PipeWireProfile, TakesNoCycleThatLacksAPart) {
   EXPECT_THAT(noDriver.beginCycle().info(1, 0).clock({}).endCycle().cycles(), IsEmpty());
 }
 
-TEST(PipeWireProfile, TakesNothingFromWhatIsNoProfile) {
+TEST(PipeWireProfile, ReadsNoCyclesFromAPodThatIsNotAProfile) {
   constexpr std::uint32_t kRoom = 64;
   alignas(8) std::array<std::uint8_t, kRoom> bytes{};
   spa_pod_builder builder{};

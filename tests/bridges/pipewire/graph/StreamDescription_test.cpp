@@ -29,7 +29,7 @@ TEST(StreamDescription, GivesEachRoleItsServiceType) {
   }
 }
 
-TEST(StreamDescription, TakesTheApplicationFromTheNodeOrItsClientInOrderOfWorth) {
+TEST(StreamDescription, TakesTheApplicationFromTheNodeOrItsClientInOrderOfPreference) {
   struct Case {
     Properties node;
     Properties client;
@@ -53,7 +53,7 @@ TEST(StreamDescription, TakesTheApplicationFromTheNodeOrItsClientInOrderOfWorth)
   }
 }
 
-TEST(StreamDescription, CallsASinkWhatPeopleCallIt) {
+TEST(StreamDescription, NamesASinkByDescriptionThenNicknameThenName) {
   const std::string name(kNodeNameKey);
   const std::string nick(kNodeNickKey);
   const std::string description(kNodeDescriptionKey);
@@ -62,7 +62,7 @@ TEST(StreamDescription, CallsASinkWhatPeopleCallIt) {
   EXPECT_EQ(deviceNameOf({{name, "alsa_output.0"}}), "alsa_output.0");
 }
 
-TEST(StreamDescription, KnowsStreamsAndSinksByMediaClass) {
+TEST(StreamDescription, RecognisesStreamsAndSinksByMediaClass) {
   const auto of = [](const char* mediaClass) {
     return Properties{{std::string(kMediaClassKey), mediaClass}};
   };
@@ -85,7 +85,7 @@ TEST(StreamDescription, KnowsStreamsAndSinksByMediaClass) {
   EXPECT_FALSE(isSource({}));
 }
 
-TEST(StreamDescription, KnowsADriverByWhatItSays) {
+TEST(StreamDescription, RecognisesADriverByItsProperty) {
   const std::string driver(kNodeDriverKey);
   EXPECT_TRUE(isDriver({{driver, "true"}}));
   EXPECT_TRUE(isDriver({{driver, "1"}}));
@@ -93,12 +93,12 @@ TEST(StreamDescription, KnowsADriverByWhatItSays) {
   EXPECT_FALSE(isDriver({}));
 }
 
-TEST(AudioFormat, ReadsAsSampleFormatRateAndChannels) {
+TEST(AudioFormat, PrintsSampleFormatRateAndChannels) {
   EXPECT_EQ((AudioFormat{"lpcm", "F32LE", 48'000, 2}.text()), "F32LE 48000 Hz 2 ch");
   EXPECT_EQ((AudioFormat{"iec958", "", 44'100, 2}.text()), "iec958 44100 Hz 2 ch");
 }
 
-TEST(CleanText, KeepsUtf8AndReplacesEverythingElse) {
+TEST(CleanText, KeepsUtf8AndReplacesInvalidBytesAndControlCharacters) {
   struct Case {
     std::string text;
     std::string clean;

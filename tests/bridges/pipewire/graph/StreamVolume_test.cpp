@@ -14,7 +14,7 @@ StreamVolume withChannels(std::vector<double> channels) {
   return volume;
 }
 
-TEST(StreamVolume, IsUnknownUntilSomethingIsSaid) {
+TEST(StreamVolume, IsUnknownWithoutAFactor) {
   EXPECT_EQ(StreamVolume().shown(), std::nullopt);
   StreamVolume muted;
   muted.mute = true;
@@ -27,7 +27,7 @@ TEST(StreamVolume, IsTheCubeRootThatMixersShow) {
   EXPECT_EQ(withChannels({0.0, 0.0}).shown(), 0.0);
 }
 
-TEST(StreamVolume, ReadsAsItWasSetInSinglePrecision) {
+TEST(StreamVolume, EqualsTheValueSetInSinglePrecision) {
   for (int percent = 0; percent <= 100; ++percent) {
     const float set = static_cast<float>(percent) / 100.0F;
     const double factor = static_cast<double>(set * set * set);
@@ -46,7 +46,7 @@ TEST(StreamVolume, StaysBetweenZeroAndOne) {
   EXPECT_EQ(withChannels({std::numeric_limits<double>::infinity()}).shown(), 1.0);
 }
 
-TEST(StreamVolume, OfAMutedStreamIsZeroUntilItSoundsAgain) {
+TEST(StreamVolume, OfAMutedStreamIsZeroUntilItIsUnmuted) {
   StreamVolume volume = withChannels({0.125});
   StreamVolume update;
   update.mute = true;

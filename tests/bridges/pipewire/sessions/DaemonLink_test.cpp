@@ -6,8 +6,8 @@
 #include <sys/socket.h>
 #include <vector>
 
+#include "bridges/pipewire/sessions/ConsoleOutput.h"
 #include "bridges/pipewire/sessions/RecordingDaemon.h"
-#include "bridges/pipewire/sessions/Said.h"
 #include "bridges/pipewire/sessions/StreamReports.h"
 #include "platform/linux/descriptors/UnixAddress.h"
 #include "support/TemporaryDirectory.h"
@@ -30,7 +30,7 @@ class DaemonLinkTest : public ::testing::Test {
   void open() {
     ASSERT_TRUE(link.open([this](DaemonLink::Connection connection) { connections.push_back(connection); }));
   }
-  // Runs what the library's thread leaves for the loop until `condition` holds.
+  // Runs the work that the library's thread posts to the loop until `condition` holds.
   bool runUntil(const std::function<bool()>& condition) {
     while (!condition()) {
       if (!loop.runReadable()) return false;
@@ -55,13 +55,13 @@ class DaemonLinkTest : public ::testing::Test {
   std::unique_ptr<RecordingDaemon> daemon;
   ManualClock clock;
   ManualEventLoop loop{clock};
-  Said said;
-  Console console{false, said.file()};
+  ConsoleOutput output;
+  Console console{false, output.file()};
   DaemonLink link{loop, console, path};
   std::vector<DaemonLink::Connection> connections;
 };
 
-TEST_F(DaemonLinkTest, AsksForASessionStepByStep) {
+TEST_F(DaemonLinkTest, SendsTheRequestsOfASessionInOrder) {
   openAndConnect();
   EXPECT_THAT(connections, ElementsAre(DaemonLink::Connection::kFirst));
   EXPECT_TRUE(link.isConnected());
@@ -91,17 +91,17 @@ TEST_F(DaemonLinkTest, AsksForASessionStepByStep) {
   EXPECT_THAT(requests[6].arguments, ElementsAre(session));
 }
 
-TEST_F(DaemonLinkTest, TriesUntilADaemonListens) {
+TEST_F(DaemonLinkTest, ConnectsAgainUntilADaemonListens) {
   open();
-  ASSERT_TRUE(runUntil([&] { return countOf(said.text(), "no reporting daemon") == 1; }));
+  ASSERT_TRUE(runUntil([&] { return countOf(output.text(), "no reporting daemon") == 1; }));
   EXPECT_FALSE(link.isConnected());
   startDaemon();
   ASSERT_TRUE(waitForConnections(1));
-  EXPECT_EQ(countOf(said.text(), "no reporting daemon"), 1);
-  EXPECT_THAT(said.text(), HasSubstr("connected to the reporting daemon"));
+  EXPECT_EQ(countOf(output.text(), "no reporting daemon"), 1);
+  EXPECT_THAT(output.text(), HasSubstr("connected to the reporting daemon"));
 }
 
-TEST_F(DaemonLinkTest, KeepsNothingForADaemonThatHasNotBeenThere) {
+TEST_F(DaemonLinkTest, DropsCallsMadeBeforeTheFirstConnection) {
   open();
   link.create(77);
   link.configure(77, 7, {{"HostApplicationDisplayID", "player"}});
@@ -114,14 +114,14 @@ TEST_F(DaemonLinkTest, KeepsNothingForADaemonThatHasNotBeenThere) {
   EXPECT_THAT(daemon->methods(), ElementsAre("getAllReporters"));
 }
 
-TEST_F(DaemonLinkTest, BringsItsSessionsToADaemonThatRestarts) {
+TEST_F(DaemonLinkTest, MakesItsSessionsAgainInARestartedDaemon) {
   openAndConnect();
   link.create(77);
   link.configure(77, 7, {{"HostApplicationDisplayID", "player"}});
   link.start(77);
   ASSERT_TRUE(link.finish(seconds(30)));
   loseDaemon();
-  EXPECT_EQ(countOf(said.text(), "lost the reporting daemon"), 1);
+  EXPECT_EQ(countOf(output.text(), "lost the reporting daemon"), 1);
   link.create(78);
   startDaemon();
   ASSERT_TRUE(waitForConnections(2));
@@ -133,13 +133,13 @@ TEST_F(DaemonLinkTest, BringsItsSessionsToADaemonThatRestarts) {
   EXPECT_THAT(daemon->requests()[4].arguments, ElementsAre(Argument(Value(78))));
 }
 
-TEST_F(DaemonLinkTest, FinishesNothingWithADaemonThatIsGone) {
+TEST_F(DaemonLinkTest, CannotFinishWithoutADaemon) {
   openAndConnect();
   daemon.reset();
   EXPECT_FALSE(link.finish(std::chrono::milliseconds(100)));
 }
 
-TEST_F(DaemonLinkTest, SaysARefusalOnceHoweverOftenItComes) {
+TEST_F(DaemonLinkTest, ReportsARepeatedRefusalOnce) {
   startDaemon();
   daemon->refuse({"com.orvane.audio.reporting", 1, ""});
   open();
@@ -148,7 +148,7 @@ TEST_F(DaemonLinkTest, SaysARefusalOnceHoweverOftenItComes) {
   for (int i = 0; i < 5; ++i) link.message(77, 5, 0, {{"QMSessionVolume", 0.5}});
   ASSERT_TRUE(link.finish(seconds(30)));
   const auto refusals = [&](const std::string& method) {
-    return countOf(said.text(), method + " refused: com.orvane.audio.reporting 1");
+    return countOf(output.text(), method + " refused: com.orvane.audio.reporting 1");
   };
   ASSERT_TRUE(runUntil([&] { return refusals("sendMessage") > 0; }));
   link.stop(77);
@@ -156,29 +156,30 @@ TEST_F(DaemonLinkTest, SaysARefusalOnceHoweverOftenItComes) {
   EXPECT_EQ(refusals("sendMessage"), 1);
 }
 
-// A daemon that accepts and then reads nothing must not stop the thread that PipeWire's events come on.
+// A daemon that accepts and then reads nothing must not block the thread on which PipeWire's events arrive.
 TEST_F(DaemonLinkTest, NeverWaitsForADaemonThatDoesNotRead) {
-  const FileDescriptor deaf(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
+  const FileDescriptor listener(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
   const auto address = unixAddressOf(path);
   ASSERT_TRUE(address);
-  ASSERT_EQ(bind(deaf.get(), generic(*address), sizeof(*address)), 0);
-  ASSERT_EQ(listen(deaf.get(), 1), 0);
+  ASSERT_EQ(bind(listener.get(), generic(*address), sizeof(*address)), 0);
+  ASSERT_EQ(listen(listener.get(), 1), 0);
   open();
   ASSERT_TRUE(waitForConnections(1));
   link.create(77);
   const ValueMap message{{"text", std::string(1000, 'x')}};
-  for (int sent = 0; sent < 10'000; ++sent) link.message(77, 5, 0, message);  // ten times what can wait
+  for (int sent = 0; sent < 10'000; ++sent)
+    link.message(77, 5, 0, message);  // ten times the limit of waiting messages
   EXPECT_TRUE(link.isConnected());
 }
 
-// A stream that plays on while the daemon restarts is told to the new one, from its present state.
-TEST_F(DaemonLinkTest, BringsLiveStreamsToARestartedDaemon) {
+// A stream that keeps playing while the daemon restarts is reported to the new daemon with its present state.
+TEST_F(DaemonLinkTest, ReportsLiveStreamsToARestartedDaemon) {
   ReporterIdentifiers identifiers(clock, 1);
   StreamReports reports(link, clock, identifiers, loop);
   startDaemon();
   ASSERT_TRUE(link.open([&](DaemonLink::Connection connection) {
     connections.push_back(connection);
-    connection == DaemonLink::Connection::kFirst ? reports.restartAll() : reports.retellAll();
+    connection == DaemonLink::Connection::kFirst ? reports.restartAll() : reports.resendAll();
   }));
   ASSERT_TRUE(waitForConnections(1));
   StreamState state{true, "player", "Music", true, 0.5, AudioFormat{"lpcm", "F32LE", 48'000, 2}, "Speaker"};

@@ -12,7 +12,7 @@ constexpr Overload kFirst{.time = 10.0, .frames = 1024, .cycle = 7, .xruns = 1};
 constexpr Overload kSecond{.time = 10.1, .frames = 512, .cycle = 9, .xruns = 2};
 constexpr Overload kThird{.time = 10.2, .frames = 2048, .cycle = 11, .xruns = 4};
 
-TEST(OverloadPacer, LetsTheFirstPassAtOnce) {
+TEST(OverloadPacer, LetsTheFirstOnePassAtOnce) {
   OverloadPacer pacer;
   EXPECT_EQ(pacer.take(milliseconds(0)), std::nullopt);
   EXPECT_EQ(pacer.deadline(), std::nullopt);
@@ -21,7 +21,7 @@ TEST(OverloadPacer, LetsTheFirstPassAtOnce) {
   EXPECT_EQ(pacer.take(milliseconds(0)), std::nullopt);
 }
 
-TEST(OverloadPacer, GathersWhatFollowsIntoOneForEachSecond) {
+TEST(OverloadPacer, AddsUpLaterOnesToOneASecond) {
   OverloadPacer pacer;
   pacer.add(kFirst);
   EXPECT_EQ(pacer.take(milliseconds(500)), kFirst);
@@ -33,7 +33,7 @@ TEST(OverloadPacer, GathersWhatFollowsIntoOneForEachSecond) {
   EXPECT_EQ(pacer.deadline(), std::nullopt);
 }
 
-TEST(OverloadPacer, LetsPassAtOnceAgainWhatComesLater) {
+TEST(OverloadPacer, LetsOneAfterTheIntervalPassAtOnce) {
   OverloadPacer pacer;
   pacer.add(kFirst);
   EXPECT_EQ(pacer.take(milliseconds(0)), kFirst);
@@ -41,7 +41,7 @@ TEST(OverloadPacer, LetsPassAtOnceAgainWhatComesLater) {
   EXPECT_EQ(pacer.take(milliseconds(1000)), kSecond);
 }
 
-TEST(OverloadPacer, GivesTheRestWhenAsked) {
+TEST(OverloadPacer, GivesAHeldOneBeforeItIsDueOnRequest) {
   OverloadPacer pacer;
   EXPECT_EQ(pacer.takeRest(), std::nullopt);
   pacer.add(kFirst);
@@ -51,7 +51,7 @@ TEST(OverloadPacer, GivesTheRestWhenAsked) {
   EXPECT_EQ(pacer.takeRest(), std::nullopt);
 }
 
-TEST(OverloadPacer, ForgetsWhatItHolds) {
+TEST(OverloadPacer, ForgetsAHeldOneWhenCleared) {
   OverloadPacer pacer;
   pacer.add(kFirst);
   pacer.clear();

@@ -9,7 +9,7 @@
 #include <utility>
 #include <vector>
 
-#include "platform/Log.h"
+#include "platform/LogCategory.h"
 #include "platform/linux/socket/UnixSocketListener.h"
 #include "protocol/Requests.h"
 #include "support/memory/MemoryLog.h"
@@ -17,8 +17,8 @@
 
 namespace tonewerk {
 
-// The daemon's request set on a real socket with nothing behind it, for a client's test to see what arrives.
-// Answers true, a start never.
+// Serves the daemon's request set on a real socket and records the requests, so that a client's test can
+// check them. Answers every request with true, except a start, which it never answers.
 class RecordingDaemon final : private MessagingListenerDelegate {
  public:
   struct Request {
@@ -42,7 +42,7 @@ class RecordingDaemon final : private MessagingListenerDelegate {
 
   [[nodiscard]] bool isListening() const { return listener_ != nullptr; }
 
-  // From now on every request but getAllReporters is answered with this error.
+  // Answers every later request but getAllReporters with this error.
   void refuse(ReplyError error) {
     const MutexLock lock(mutex_);
     refusal_ = std::move(error);
@@ -66,9 +66,9 @@ class RecordingDaemon final : private MessagingListenerDelegate {
   }
 
  private:
-  class Object final : public RequestHandler {
+  class Handler final : public RequestHandler {
    public:
-    explicit Object(RecordingDaemon& daemon) : daemon_(daemon) {}
+    explicit Handler(RecordingDaemon& daemon) : daemon_(daemon) {}
     void handleRequest(std::size_t method, Arguments arguments, Reply reply, InFlightToken) override {
       daemon_.handle(method, std::move(arguments), reply);
     }
@@ -77,16 +77,16 @@ class RecordingDaemon final : private MessagingListenerDelegate {
     RecordingDaemon& daemon_;
   };
 
-  static const RequestSet& interface() { return requests::all(); }
+  static const RequestSet& requestSet() { return requests::all(); }
 
   bool listenerShouldAcceptNewConnection(MessagingConnection& connection) override {
-    connection.setRequestHandler(interface(), std::make_shared<Object>(*this));
+    connection.setRequestHandler(requestSet(), std::make_shared<Handler>(*this));
     connection.resume();
     return true;
   }
 
   void handle(std::size_t method, Arguments arguments, const Reply& reply) {
-    const std::string name(interface().methods[method].name);
+    const std::string name(requestSet().methods[method].name);
     std::optional<ReplyError> refusal;
     {
       const MutexLock lock(mutex_);

@@ -11,7 +11,7 @@ namespace {
 
 constexpr std::int64_t kExactInDoubles = std::int64_t{1} << 53;
 
-TEST(ReporterIdentifiers, AreDifferentWhileTheClockStandsOrGoesBack) {
+TEST(ReporterIdentifiers, AreDifferentWhileTheClockStopsOrGoesBack) {
   ManualClock clock;
   ReporterIdentifiers identifiers(clock, 4711);
   std::set<std::int64_t> seen;
@@ -32,7 +32,7 @@ TEST(ReporterIdentifiers, DifferBetweenTwoBridgesAtTheSameTime) {
   EXPECT_NE(ReporterIdentifiers(clock, 1000).next(), ReporterIdentifiers(clock, 1001).next());
 }
 
-TEST(ReporterIdentifiers, AreOrdinaryNumbersWhateverTheClockSays) {
+TEST(ReporterIdentifiers, StayInRangeForAnyClock) {
   for (const double now : {-5.0, 0.0, ManualClock::kStart, 8.7e9, 1e30}) {
     const ManualClock clock(now);
     for (const std::int64_t process : {std::int64_t{0}, std::int64_t{1}, std::int64_t{4'194'303}}) {

@@ -18,7 +18,7 @@ using ::testing::ElementsAre;
 using ::testing::IsEmpty;
 using ::testing::SizeIs;
 
-// One stream, told about through StreamReports, so that the timer is in play.
+// Reports one stream through StreamReports, so that its timer is tested too.
 class StreamReporterTest : public ::testing::Test {
  protected:
   static constexpr std::uint32_t kStream = 40;
@@ -32,28 +32,28 @@ class StreamReporterTest : public ::testing::Test {
     state.device = "Speaker";
   }
 
-  void tell() { reports.streamChanged(kStream, state); }
-  void run(bool running) {
+  void update() { reports.streamChanged(kStream, state); }
+  void setRunning(bool running) {
     state.running = running;
-    tell();
+    update();
   }
   void setVolume(double volume) {
     state.volume = volume;
-    tell();
+    update();
   }
   void setDevice(const char* device) {
     state.device = device;
-    tell();
+    update();
   }
   void leave() { reports.streamGone(kStream); }
   void play() {
-    run(true);
+    setRunning(true);
     clock.advance(1.0);
   }
 
-  // "3 on 0.5 Speaker": seconds since the test began, running, volume, devices; with the duration where there
-  // is one.
-  std::vector<std::string> told(std::size_t session = 0) {
+  // The messages of a session, such as "3 on 0.5 Speaker": seconds since the test began, running, volume and
+  // devices. "end" and the duration follow in a message that has one.
+  std::vector<std::string> sent(std::size_t session = 0) {
     std::vector<std::string> lines;
     if (sink.sessions.size() <= session) return lines;
     for (const MemorySessionSink::Message& message : sink.sessions[session].messages) {
@@ -67,7 +67,7 @@ class StreamReporterTest : public ::testing::Test {
     }
     return lines;
   }
-  // "cycle 7: 2": the driver's cycle and the number of xruns.
+  // The overloads of a session, such as "cycle 7: 2": the driver's cycle and the number of xruns.
   std::vector<std::string> overloads(std::size_t session = 0) {
     std::vector<std::string> lines;
     if (sink.sessions.size() <= session) return lines;
@@ -90,22 +90,22 @@ class StreamReporterTest : public ::testing::Test {
 };
 
 TEST_F(StreamReporterTest, BeginsASessionForAStreamThatIsDescribed) {
-  tell();
+  update();
   ASSERT_THAT(sink.sessions, SizeIs(1));
   EXPECT_THAT(sink.only().calls, ElementsAre("create", "configure", "start"));
   EXPECT_EQ(sink.only().serviceType, 7);
   EXPECT_EQ(sink.only().configuration, (ValueMap{{"HostApplicationDisplayID", "com.example.player"}}));
 }
 
-TEST_F(StreamReporterTest, WaitsForTheDescriptionButNotForEver) {
+TEST_F(StreamReporterTest, WaitsForTheDescriptionForALimitedTime) {
   state.described = false;
-  tell();
+  update();
   EXPECT_THAT(sink.sessions, IsEmpty());
-  clock.advance(StreamReporter::kLongestHold);
+  clock.advance(StreamReporter::kMaxHold);
   EXPECT_THAT(sink.sessions, SizeIs(1));
 }
 
-TEST_F(StreamReporterTest, TellsAStartWithEverythingAboutIt) {
+TEST_F(StreamReporterTest, SendsAStartWithTheWholeState) {
   clock.advance(2.0);
   play();
   ASSERT_THAT(sink.sessions, SizeIs(1));
@@ -122,144 +122,144 @@ TEST_F(StreamReporterTest, TellsAStartWithEverythingAboutIt) {
                                        {"mChannelsPerFrame", 2}}));
 }
 
-TEST_F(StreamReporterTest, HoldsAStartUntilItsDeviceIsKnownAndTellsItsOwnTime) {
+TEST_F(StreamReporterTest, HoldsAStartUntilItsDeviceIsKnownAndKeepsTheStartTime) {
   state.device = "";
-  run(true);
+  setRunning(true);
   clock.advance(0.5);
-  EXPECT_THAT(told(), IsEmpty());
+  EXPECT_THAT(sent(), IsEmpty());
   setDevice("Speaker");
   clock.advance(0.5);
-  EXPECT_THAT(told(), ElementsAre("0 on 0.5 Speaker"));
+  EXPECT_THAT(sent(), ElementsAre("0 on 0.5 Speaker"));
 }
 
 TEST_F(StreamReporterTest, HoldsAStartUntilItsFormatIsKnown) {
   const std::optional<AudioFormat> format = std::exchange(state.format, std::nullopt);
-  run(true);
+  setRunning(true);
   clock.advance(0.5);
-  EXPECT_THAT(told(), IsEmpty());
+  EXPECT_THAT(sent(), IsEmpty());
   state.format = format;
-  tell();
+  update();
   clock.advance(0.5);
-  EXPECT_THAT(told(), ElementsAre("0 on 0.5 Speaker"));
+  EXPECT_THAT(sent(), ElementsAre("0 on 0.5 Speaker"));
 }
 
-TEST_F(StreamReporterTest, HoldsAnIncompleteStartNoLongerThanASecond) {
+TEST_F(StreamReporterTest, HoldsAnIncompleteStartForAtMostASecond) {
   state.device = "";
-  run(true);
-  clock.advance(StreamReporter::kLongestHold);
-  EXPECT_THAT(told(), ElementsAre("0 on 0.5 (null)"));
+  setRunning(true);
+  clock.advance(StreamReporter::kMaxHold);
+  EXPECT_THAT(sent(), ElementsAre("0 on 0.5 (null)"));
 }
 
-TEST_F(StreamReporterTest, TellsOneStartAtTheVolumeThatItSettlesOn) {
+TEST_F(StreamReporterTest, SendsOneStartWithTheSettledVolume) {
   setVolume(1.0);
-  run(true);
+  setRunning(true);
   clock.advance(0.05);
-  setVolume(0.4);  // what the session manager remembers of this application
+  setVolume(0.4);  // the volume that the session manager has stored for this application
   clock.advance(1.0);
-  EXPECT_THAT(told(), ElementsAre("0 on 0.4 Speaker"));
+  EXPECT_THAT(sent(), ElementsAre("0 on 0.4 Speaker"));
 }
 
-TEST_F(StreamReporterTest, TellsAVolumeChangeWithItsTime) {
+TEST_F(StreamReporterTest, SendsAVolumeChangeWithItsTime) {
   play();
   clock.advance(2.0);
   setVolume(0.3);
   clock.advance(1.0);
-  EXPECT_THAT(told(), ElementsAre("0 on 0.5 Speaker", "3 on 0.3 Speaker"));
+  EXPECT_THAT(sent(), ElementsAre("0 on 0.5 Speaker", "3 on 0.3 Speaker"));
 }
 
-TEST_F(StreamReporterTest, TellsOnlyTheVolumeThatADragEndsOn) {
+TEST_F(StreamReporterTest, SendsOnlyTheVolumeAtTheEndOfADrag) {
   play();
   for (const double step : {0.45, 0.4, 0.35, 0.3}) {
     clock.advance(0.1);
     setVolume(step);
   }
   clock.advance(1.0);
-  EXPECT_THAT(told(), ElementsAre("0 on 0.5 Speaker", "1.4 on 0.3 Speaker"));
+  EXPECT_THAT(sent(), ElementsAre("0 on 0.5 Speaker", "1.4 on 0.3 Speaker"));
 }
 
-TEST_F(StreamReporterTest, TellsEachSecondOfADragThatDoesNotEnd) {
+TEST_F(StreamReporterTest, SendsOneMessageASecondDuringALongDrag) {
   play();
   for (int step = 0; step < 30; ++step) {
     clock.advance(0.1);
     setVolume(0.5 + 0.01 * (step + 1));
   }
-  EXPECT_THAT(told(), SizeIs(3));
+  EXPECT_THAT(sent(), SizeIs(3));
 }
 
-TEST_F(StreamReporterTest, TellsNothingOfAChangeThatIsTakenBack) {
+TEST_F(StreamReporterTest, SendsNothingForAChangeThatIsUndone) {
   play();
   setVolume(0.6);
   clock.advance(0.05);
   setVolume(0.5);
   clock.advance(1.0);
-  EXPECT_THAT(told(), ElementsAre("0 on 0.5 Speaker"));
+  EXPECT_THAT(sent(), ElementsAre("0 on 0.5 Speaker"));
 }
 
-TEST_F(StreamReporterTest, HoldsAChangeNoLongerForNewsOfOtherThings) {
+TEST_F(StreamReporterTest, DoesNotHoldAChangeLongerForOtherChanges) {
   play();
   setVolume(0.3);
   clock.advance(0.15);
   state.application = "renamed";
-  tell();
+  update();
   clock.advance(0.05);
-  EXPECT_THAT(told(), ElementsAre("0 on 0.5 Speaker", "1 on 0.3 Speaker"));
+  EXPECT_THAT(sent(), ElementsAre("0 on 0.5 Speaker", "1 on 0.3 Speaker"));
 }
 
-TEST_F(StreamReporterTest, TellsAMoveToAnotherSinkOnceWhateverTheStepsOnTheWay) {
+TEST_F(StreamReporterTest, SendsOneMessageForAMoveToAnotherSink) {
   play();
   for (const char* step : {"", "Headset, Speaker", "Headset"}) setDevice(step);
   clock.advance(1.0);
-  EXPECT_THAT(told(), ElementsAre("0 on 0.5 Speaker", "1 on 0.5 Headset"));
+  EXPECT_THAT(sent(), ElementsAre("0 on 0.5 Speaker", "1 on 0.5 Headset"));
 }
 
-TEST_F(StreamReporterTest, TellsAPauseAtOnce) {
+TEST_F(StreamReporterTest, SendsAPauseAtOnce) {
   play();
-  run(false);
-  EXPECT_THAT(told(), ElementsAre("0 on 0.5 Speaker", "1 off 0.5 Speaker"));
+  setRunning(false);
+  EXPECT_THAT(sent(), ElementsAre("0 on 0.5 Speaker", "1 off 0.5 Speaker"));
 }
 
-TEST_F(StreamReporterTest, TellsWhatItHoldsBeforeAPause) {
+TEST_F(StreamReporterTest, SendsAHeldChangeBeforeAPause) {
   play();
   setVolume(0.3);
   clock.advance(0.1);
-  run(false);
-  EXPECT_THAT(told(), ElementsAre("0 on 0.5 Speaker", "1 on 0.3 Speaker", "1.1 off 0.3 Speaker"));
+  setRunning(false);
+  EXPECT_THAT(sent(), ElementsAre("0 on 0.5 Speaker", "1 on 0.3 Speaker", "1.1 off 0.3 Speaker"));
 }
 
-TEST_F(StreamReporterTest, TellsASoundShorterThanTheSettleTime) {
-  run(true);
+TEST_F(StreamReporterTest, SendsStartAndPauseOfASoundShorterThanTheSettleTime) {
+  setRunning(true);
   clock.advance(0.1);
-  run(false);
-  EXPECT_THAT(told(), ElementsAre("0 on 0.5 Speaker", "0.1 off 0.5 Speaker"));
+  setRunning(false);
+  EXPECT_THAT(sent(), ElementsAre("0 on 0.5 Speaker", "0.1 off 0.5 Speaker"));
 }
 
-TEST_F(StreamReporterTest, TellsAVolumeChangeDuringAPause) {
+TEST_F(StreamReporterTest, SendsAVolumeChangeDuringAPause) {
   play();
-  run(false);
+  setRunning(false);
   setVolume(0.8);
   clock.advance(1.0);
-  run(true);
+  setRunning(true);
   clock.advance(1.0);
-  EXPECT_THAT(told(),
+  EXPECT_THAT(sent(),
               ElementsAre("0 on 0.5 Speaker", "1 off 0.5 Speaker", "1 off 0.8 Speaker", "2 on 0.8 Speaker"));
 }
 
-TEST_F(StreamReporterTest, RemembersDeviceAndFormatThroughAPause) {
+TEST_F(StreamReporterTest, KeepsDeviceAndFormatDuringAPause) {
   play();
   state.device = "";
   state.format.reset();
-  run(false);
+  setRunning(false);
   clock.advance(1.0);
-  EXPECT_THAT(told(), ElementsAre("0 on 0.5 Speaker", "1 off 0.5 Speaker"));
+  EXPECT_THAT(sent(), ElementsAre("0 on 0.5 Speaker", "1 off 0.5 Speaker"));
 }
 
-// Each message must differ from the one before it in more than its time: the daemon drops one that does not.
+// The daemon drops a message that differs from the one before it in nothing but its time.
 TEST_F(StreamReporterTest, RepeatsNoMessage) {
   play();
   for (int round = 0; round < 3; ++round) {
-    run(false);
+    setRunning(false);
     clock.advance(1.0);
-    run(true);
+    setRunning(true);
     clock.advance(1.0);
   }
   const std::vector<MemorySessionSink::Message>& messages = sink.only().messages;
@@ -273,43 +273,43 @@ TEST_F(StreamReporterTest, RepeatsNoMessage) {
 
 TEST_F(StreamReporterTest, EndsTheSessionOfAStreamThatLeavesWhileItPlays) {
   clock.advance(1.0);
-  tell();
+  update();
   clock.advance(1.0);
   play();
   clock.advance(3.5);
   leave();
-  EXPECT_THAT(told(), ElementsAre("2 on 0.5 Speaker", "6.5 off 0.5 Speaker end 5.5"));
+  EXPECT_THAT(sent(), ElementsAre("2 on 0.5 Speaker", "6.5 off 0.5 Speaker end 5.5"));
   EXPECT_EQ(sink.only().messages.back().type, 2);
   EXPECT_THAT(sink.only().calls,
               ElementsAre("create", "configure", "start", "message", "message", "stop", "destroy"));
 }
 
-TEST_F(StreamReporterTest, TellsWhatItHoldsBeforeTheEnd) {
-  run(true);
+TEST_F(StreamReporterTest, SendsAHeldChangeBeforeTheEnd) {
+  setRunning(true);
   clock.advance(0.1);
   leave();
-  EXPECT_THAT(told(), ElementsAre("0 on 0.5 Speaker", "0.1 off 0.5 Speaker end 0.1"));
+  EXPECT_THAT(sent(), ElementsAre("0 on 0.5 Speaker", "0.1 off 0.5 Speaker end 0.1"));
 }
 
-TEST_F(StreamReporterTest, GivesAStreamThatLeavesUndescribedItsSessionToo) {
+TEST_F(StreamReporterTest, BeginsASessionForAStreamThatLeavesUndescribed) {
   state.described = false;
-  run(true);
+  setRunning(true);
   clock.advance(0.1);
   leave();
-  EXPECT_THAT(told(), ElementsAre("0 on 0.5 Speaker", "0.1 off 0.5 Speaker end 0.1"));
+  EXPECT_THAT(sent(), ElementsAre("0 on 0.5 Speaker", "0.1 off 0.5 Speaker end 0.1"));
   EXPECT_THAT(sink.only().calls,
               ElementsAre("create", "configure", "start", "message", "message", "stop", "destroy"));
 }
 
-TEST_F(StreamReporterTest, GivesASilentStreamThatLeavesUndescribedItsSessionToo) {
+TEST_F(StreamReporterTest, BeginsASessionForASilentStreamThatLeavesUndescribed) {
   state.described = false;
-  tell();
+  update();
   leave();
   ASSERT_THAT(sink.sessions, SizeIs(1));
   EXPECT_THAT(sink.only().calls, ElementsAre("create", "configure", "start", "message", "stop", "destroy"));
 }
 
-TEST_F(StreamReporterTest, MeasuresTheSessionBySteadyTime) {
+TEST_F(StreamReporterTest, MeasuresTheSessionByMonotonicTime) {
   play();
   clock.setNow(kBegin - 5000.0);
   clock.advance(1.0);
@@ -317,7 +317,7 @@ TEST_F(StreamReporterTest, MeasuresTheSessionBySteadyTime) {
   EXPECT_NEAR(sink.only().messages.back().payload.number("session_duration"), 2.0, 1e-6);
 }
 
-TEST_F(StreamReporterTest, BeginsANewSessionFromThePresentStateForADaemonThatLostTheOld) {
+TEST_F(StreamReporterTest, BeginsANewSessionWithThePresentStateAtARestart) {
   play();
   setVolume(0.3);
   clock.advance(1.0);
@@ -326,47 +326,47 @@ TEST_F(StreamReporterTest, BeginsANewSessionFromThePresentStateForADaemonThatLos
   leave();
   ASSERT_THAT(sink.sessions, SizeIs(2));
   EXPECT_NE(sink.sessions[0].reporterID, sink.sessions[1].reporterID);
-  EXPECT_THAT(told(1), ElementsAre("2 on 0.3 Speaker", "4 off 0.3 Speaker end 2"));
+  EXPECT_THAT(sent(1), ElementsAre("2 on 0.3 Speaker", "4 off 0.3 Speaker end 2"));
 }
 
-TEST_F(StreamReporterTest, SaysNothingOfAPausedStreamInANewSessionUntilItPlays) {
+TEST_F(StreamReporterTest, SendsNothingForAPausedStreamInANewSessionUntilItPlays) {
   play();
-  run(false);
+  setRunning(false);
   reports.restartAll();
   clock.advance(2.0);
-  EXPECT_THAT(told(1), IsEmpty());
+  EXPECT_THAT(sent(1), IsEmpty());
   play();
-  EXPECT_THAT(told(1), ElementsAre("3 on 0.5 Speaker"));
+  EXPECT_THAT(sent(1), ElementsAre("3 on 0.5 Speaker"));
 }
 
-TEST_F(StreamReporterTest, TellsHowItPlaysOnceMoreInTheSameSession) {
+TEST_F(StreamReporterTest, SendsItsStateAgainInTheSameSession) {
   play();
   clock.advance(1.0);
-  reports.retellAll();
+  reports.resendAll();
   clock.advance(1.0);
   ASSERT_THAT(sink.sessions, SizeIs(1));
-  EXPECT_THAT(told(0), ElementsAre("0 on 0.5 Speaker", "2 on 0.5 Speaker"));
+  EXPECT_THAT(sent(0), ElementsAre("0 on 0.5 Speaker", "2 on 0.5 Speaker"));
 }
 
-TEST_F(StreamReporterTest, TellsAHeldChangeOnceAndWithItsOwnTimeWhenAskedToTellAgain) {
+TEST_F(StreamReporterTest, SendsAHeldChangeOnceAndWithItsOwnTimeAtAResend) {
   play();
   setVolume(0.3);
-  reports.retellAll();
+  reports.resendAll();
   clock.advance(1.0);
-  ASSERT_THAT(told(0), SizeIs(2));
-  EXPECT_EQ(told(0)[1], "1 on 0.3 Speaker");
+  ASSERT_THAT(sent(0), SizeIs(2));
+  EXPECT_EQ(sent(0)[1], "1 on 0.3 Speaker");
 }
 
-TEST_F(StreamReporterTest, TellsNothingAgainOfAPausedStreamUntilItPlays) {
+TEST_F(StreamReporterTest, ResendsNothingForAPausedStreamUntilItPlays) {
   play();
-  run(false);
-  const std::size_t before = told(0).size();
-  reports.retellAll();
+  setRunning(false);
+  const std::size_t before = sent(0).size();
+  reports.resendAll();
   clock.advance(2.0);
-  EXPECT_THAT(told(0), SizeIs(before));
+  EXPECT_THAT(sent(0), SizeIs(before));
 }
 
-TEST_F(StreamReporterTest, TellsAnOverloadAtOnceUnderACategoryAndTypeOfItsOwn) {
+TEST_F(StreamReporterTest, SendsAnOverloadAtOnceWithItsOwnCategoryAndType) {
   play();
   reports.streamOverloaded(kStream, {.time = kBegin + 0.5, .frames = 512, .cycle = 77, .xruns = 2});
   const MemorySessionSink::Message& message = sink.only().messages.back();
@@ -379,7 +379,7 @@ TEST_F(StreamReporterTest, TellsAnOverloadAtOnceUnderACategoryAndTypeOfItsOwn) {
                                        {"xrun_count", 2}}));
 }
 
-TEST_F(StreamReporterTest, TellsOverloadsThatFollowOnceInASecond) {
+TEST_F(StreamReporterTest, SendsLaterOverloadsOnceASecond) {
   play();
   for (std::uint32_t i = 1; i <= 15; ++i) {
     reports.streamOverloaded(kStream, {.time = kBegin + 1.0, .frames = 512, .cycle = i, .xruns = 1});
@@ -388,15 +388,15 @@ TEST_F(StreamReporterTest, TellsOverloadsThatFollowOnceInASecond) {
   EXPECT_THAT(overloads(), ElementsAre("cycle 1: 1", "cycle 10: 9"));
   clock.advance(1.0);
   EXPECT_THAT(overloads(), ElementsAre("cycle 1: 1", "cycle 10: 9", "cycle 15: 5"));
-  // Told in time although a change is held too.
+  // An overload is sent in time although a change is held too.
   reports.streamOverloaded(kStream, {.time = kBegin, .frames = 512, .cycle = 16, .xruns = 1});
   setVolume(0.25);
   clock.advance(1.0);
   EXPECT_EQ(overloads().back(), "cycle 16: 1");
-  EXPECT_EQ(told().back(), "3.5 on 0.25 Speaker");
+  EXPECT_EQ(sent().back(), "3.5 on 0.25 Speaker");
 }
 
-TEST_F(StreamReporterTest, TellsTheLastOverloadsBeforeTheEnd) {
+TEST_F(StreamReporterTest, SendsHeldOverloadsBeforeTheEnd) {
   play();
   reports.streamOverloaded(kStream, {.time = kBegin, .frames = 512, .cycle = 1, .xruns = 1});
   reports.streamOverloaded(kStream, {.time = kBegin, .frames = 512, .cycle = 2, .xruns = 1});
@@ -407,14 +407,14 @@ TEST_F(StreamReporterTest, TellsTheLastOverloadsBeforeTheEnd) {
 
 TEST_F(StreamReporterTest, KeepsAnOverloadUntilTheSessionHasBegun) {
   state.described = false;
-  tell();
+  update();
   reports.streamOverloaded(kStream, {.time = kBegin, .frames = 512, .cycle = 1, .xruns = 1});
   EXPECT_THAT(sink.sessions, IsEmpty());
   clock.advance(1.0);
   EXPECT_THAT(overloads(), ElementsAre("cycle 1: 1"));
 }
 
-TEST_F(StreamReporterTest, TellsADaemonThatLostTheOldSessionNothingOfItsOverloads) {
+TEST_F(StreamReporterTest, DropsHeldOverloadsAtARestart) {
   play();
   reports.streamOverloaded(kStream, {.time = kBegin, .frames = 512, .cycle = 1, .xruns = 1});
   reports.streamOverloaded(kStream, {.time = kBegin, .frames = 512, .cycle = 2, .xruns = 1});
@@ -423,7 +423,7 @@ TEST_F(StreamReporterTest, TellsADaemonThatLostTheOldSessionNothingOfItsOverload
   EXPECT_THAT(overloads(1), IsEmpty());
 }
 
-TEST_F(StreamReporterTest, IgnoresOverloadsOfWhatIsNoStream) {
+TEST_F(StreamReporterTest, IgnoresOverloadsOfUnknownStreams) {
   play();
   reports.streamOverloaded(kStream + 1, {.time = kBegin, .frames = 512, .cycle = 1, .xruns = 1});
   leave();
@@ -433,7 +433,7 @@ TEST_F(StreamReporterTest, IgnoresOverloadsOfWhatIsNoStream) {
 }
 
 TEST_F(StreamReporterTest, GivesEachStreamASessionOfItsOwn) {
-  tell();
+  update();
   reports.streamChanged(41, state);
   leave();
   reports.streamChanged(kStream, state);

@@ -7,13 +7,13 @@
 
 namespace tonewerk {
 
-// What the bridge says, as text.
-class Said {
+// Collects the lines that a Console writes.
+class ConsoleOutput {
  public:
-  Said() : file_(open_memstream(&text_, &size_)) {}
-  Said(const Said&) = delete;
-  Said& operator=(const Said&) = delete;
-  ~Said() {
+  ConsoleOutput() : file_(open_memstream(&text_, &size_)) {}
+  ConsoleOutput(const ConsoleOutput&) = delete;
+  ConsoleOutput& operator=(const ConsoleOutput&) = delete;
+  ~ConsoleOutput() {
     std::fclose(file_);
     std::free(text_);
   }
