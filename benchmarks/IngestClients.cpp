@@ -13,10 +13,10 @@
 namespace tonewerk {
 namespace {
 
-// So many different messages a client; then they come again, which for the server are new ones.
+// Different messages of each client. They are then sent again; for the server they are new messages.
 constexpr std::size_t kDifferentMessages = 4096;
 constexpr std::int64_t kFirstReporterID = 100;
-constexpr int kPatienceMilliseconds = 30'000;
+constexpr int kTimeoutMilliseconds = 30'000;
 constexpr char kNil = '\xc0';
 
 [[noreturn]] void fail(const std::string& what) { throw std::runtime_error(what); }
@@ -35,7 +35,7 @@ FileDescriptor connectTo(const std::string& path) {
 }
 
 void waitFor(std::vector<pollfd>& sockets) {
-  const int ready = ::poll(sockets.data(), sockets.size(), kPatienceMilliseconds);
+  const int ready = ::poll(sockets.data(), sockets.size(), kTimeoutMilliseconds);
   if (ready == 0) fail("the server has stopped answering");
   if (ready < 0 && errno != EINTR) failWithErrno("poll");
 }
@@ -48,7 +48,7 @@ IngestClients::IngestClients(const std::string& socketPath, std::size_t count, I
     const std::int64_t reporterID = kFirstReporterID + static_cast<std::int64_t>(at);
     clients_.push_back(
         {connectTo(socketPath), IngestMessages(kind, reporterID, kDifferentMessages), "", 0, 0, 0, ""});
-    ask(clients_.back(), IngestMessages::opening(reporterID, serviceType));
+    request(clients_.back(), IngestMessages::opening(reporterID, serviceType));
   }
 }
 
@@ -75,12 +75,12 @@ void IngestClients::send(std::size_t messagesAClient, const Pace& pace) {
 
 void IngestClients::stop() {
   for (std::size_t at = 0; at < clients_.size(); ++at) {
-    ask(clients_[at], IngestMessages::closing(kFirstReporterID + static_cast<std::int64_t>(at)));
+    request(clients_[at], IngestMessages::closing(kFirstReporterID + static_cast<std::int64_t>(at)));
   }
 }
 
-// Sends what one answer comes to, and waits for it.
-void IngestClients::ask(Client& client, const std::string& bytes) {
+// Sends bytes that get one answer, and waits for the answer.
+void IngestClients::request(Client& client, const std::string& bytes) {
   client.sent = 1;
   client.answered = 0;
   if (::send(client.socket.get(), bytes.data(), bytes.size(), MSG_NOSIGNAL) !=
@@ -94,8 +94,8 @@ void IngestClients::ask(Client& client, const std::string& bytes) {
   }
 }
 
-// As many messages as the window has room for, once half of it is: writing one for each answer would make it
-// one at a time again.
+// Sends as many messages as the window has room for, but only once half of the window is free. Otherwise each
+// answer would be followed by one message, which is the same as waiting for each answer.
 void IngestClients::sendSome(Client& client, std::size_t messages, const Pace& pace) {
   if (!client.unsent.empty() && !write(client)) return;
   std::size_t room = std::min(messages - client.sent, pace.window - (client.sent - client.answered));
@@ -112,7 +112,7 @@ void IngestClients::sendSome(Client& client, std::size_t messages, const Pace& p
   }
 }
 
-// False while the socket does not take all that is to be sent.
+// False while the socket has not taken all bytes.
 bool IngestClients::write(Client& client) {
   const ssize_t taken =
       ::send(client.socket.get(), client.unsent.data(), client.unsent.size(), MSG_DONTWAIT | MSG_NOSIGNAL);

@@ -12,22 +12,22 @@
 
 namespace tonewerk {
 
-// Clients of a server under measurement, all driven by one thread: each has a session and sends messages to
-// it, with a bounded number of requests under way.
+// Runs the clients of a measured server, all on one thread. Each client has a session and sends messages to
+// it, with a limited number of requests pending.
 //
-// A failure, and an answer that is an error, throws std::runtime_error: a benchmark whose messages were
-// refused has measured nothing.
+// A failure or an error answer throws std::runtime_error, because a benchmark whose messages were refused has
+// measured nothing.
 class IngestClients {
  public:
-  // Connects `count` clients to the socket and starts a session of that service for each.
+  // Connects `count` clients to the socket and starts a session of service `serviceType` for each.
   IngestClients(const std::string& socketPath, std::size_t count, IngestMessages::Kind kind,
                 std::int64_t serviceType);
 
   struct Pace {
-    std::size_t window;          // requests under way, a client
-    std::size_t messagesAWrite;  // at most
+    std::size_t window;          // pending requests per client
+    std::size_t messagesAWrite;  // maximum
   };
-  // Every client sends so many messages, and all are answered.
+  // Sends `messagesAClient` messages from every client and waits for all answers.
   void send(std::size_t messagesAClient, const Pace& pace);
   // Stops the sessions.
   void stop();
@@ -36,14 +36,14 @@ class IngestClients {
   struct Client {
     FileDescriptor socket;
     IngestMessages messages;
-    std::string unsent;     // of the message that the socket took a part of
-    std::size_t place = 0;  // of the next message in `messages`, which are sent again and again
+    std::string unsent;     // the bytes that the socket has not taken yet
+    std::size_t place = 0;  // of the next message in `messages`, which are sent repeatedly
     std::size_t sent = 0;
     std::size_t answered = 0;
-    std::string answers;  // the start of one that is not whole yet
+    std::string answers;  // the beginning of an answer that is not complete yet
   };
 
-  void ask(Client& client, const std::string& bytes);
+  void request(Client& client, const std::string& bytes);
   void sendSome(Client& client, std::size_t messages, const Pace& pace);
   [[nodiscard]] bool write(Client& client);
   void takeAnswers(Client& client);

@@ -18,7 +18,7 @@ double now() {
   return std::chrono::duration<double>(std::chrono::system_clock::now().time_since_epoch()).count();
 }
 
-// What a playing stream says about itself, in the mix of types that clients send.
+// Describes a playing stream with values of the types that clients send.
 ValueMap payloadOf(std::int64_t position, double time) {
   return {{"twreporting_timestamp", time},
           {"session_output_running", true},

@@ -13,18 +13,18 @@ namespace {
 
 constexpr std::size_t kFillWindow = 256;
 
-// Service types. Sessions of the test service have every worker but that of real-time communication.
+// Service types. A session of the test service has all workers but the one of real-time communication.
 constexpr std::int64_t kLongFormAudio = 7;
 constexpr std::int64_t kTest = 11;
 
-void start(ServerProcess& server, IngestSide side) {
-  if (side == IngestSide::kFloor) return server.start(TONEWERK_FLOOR, {server.socketPath()});
-  // On internal builds every session gets a summary file, too.
+void start(ServerProcess& server, IngestServer side) {
+  if (side == IngestServer::kFloor) return server.start(TONEWERK_FLOOR, {server.socketPath()});
+  // On internal builds every session also gets a summary file.
   std::ofstream(server.directory() + "/device-facts.toml") << "InternalBuild = true\n";
   server.start(TONEWERK_DAEMON, {});
 }
 
-// A daemon that did not record has not done the work that is measured.
+// Checks that the daemon has recorded the messages; otherwise the measured work was not done.
 void checkStore(const ServerProcess& server, std::size_t wanted) {
   SqliteDatabase database;
   std::optional<std::int64_t> rows;
@@ -45,7 +45,7 @@ std::size_t rowsOf(const IngestScenario& scenario) {
 
 }  // namespace
 
-IngestCost measureIngest(const IngestScenario& scenario, IngestSide side) {
+IngestCost measureIngest(const IngestScenario& scenario, IngestServer side) {
   ServerProcess server;
   start(server, side);
   IngestClients clients(server.socketPath(), scenario.clients, scenario.kind,
@@ -70,7 +70,7 @@ IngestCost measureIngest(const IngestScenario& scenario, IngestSide side) {
     const auto earlier = known == threadsBefore.end() ? ServerProcess::Processor(0) : known->second;
     cost.threads[name] = IngestCost::Microseconds(time - earlier) / messages;
   }
-  if (side == IngestSide::kDaemon) checkStore(server, rowsOf(scenario));
+  if (side == IngestServer::kDaemon) checkStore(server, rowsOf(scenario));
   clients.stop();
   server.waitUntilIdle();
   cost.stopTime = IngestCost::Microseconds(server.processorTime() - after) /

@@ -10,36 +10,38 @@
 
 namespace tonewerk {
 
-// What is sent to a server.
+// Describes the messages that are sent to a server.
 struct IngestScenario {
   std::string name;
   std::size_t clients;
   IngestMessages::Kind kind;
-  std::size_t window;          // requests under way, a client
-  std::size_t messagesAWrite;  // at most; a client library writes each by itself
-  std::size_t messages;        // measured ones, of all clients together
-  std::size_t storedBefore;    // messages that come before the measured ones, likewise
-  // A session's real-time-communication records are a second row a message.
+  std::size_t window;          // pending requests per client
+  std::size_t messagesAWrite;  // maximum; the client library writes each message separately
+  std::size_t messages;        // measured messages of all clients together
+  std::size_t storedBefore;    // messages before the measured ones, of all clients together
+  // Each message is also recorded by the real-time-communication worker, as a second row.
   bool recordsCalls = false;
 };
 
-enum class IngestSide {
-  kDaemon,  // recording analytics events in its store, and summary files
+enum class IngestServer {
+  kDaemon,  // writes analytics events to its store, and summary files
   kFloor,
 };
 
-// What that cost. Processor time is the server's alone, up to where the store has written everything.
+// Holds the cost of a scenario. Processor time is that of the server only, until the store has written
+// everything.
 struct IngestCost {
   using Microseconds = std::chrono::duration<double, std::micro>;
 
-  Microseconds processorTime{};  // a message
+  Microseconds processorTime{};  // per message
   double messagesPerSecond = 0.0;
-  Microseconds stopTime{};                      // processor time of the sessions' stop, a message that came
-  std::size_t peakMemory = 0;                   // bytes, the stop included
+  Microseconds stopTime{};                      // processor time of the sessions' stop, per received message
+  std::size_t peakMemory = 0;                   // in bytes, stop included
   std::map<std::string, Microseconds> threads;  // processorTime by thread
 };
 
-// Runs the scenario once against a fresh server. Throws std::runtime_error when it did not take everything.
-IngestCost measureIngest(const IngestScenario& scenario, IngestSide side);
+// Runs the scenario once with a new server. Throws std::runtime_error when the server did not take all
+// messages.
+IngestCost measureIngest(const IngestScenario& scenario, IngestServer side);
 
 }  // namespace tonewerk

@@ -28,7 +28,7 @@ bool failed(const char* what, std::string& problem) {
   return false;
 }
 
-// A /run that this process and its children alone see.
+// Gives this process and its children a private, empty /run.
 bool hideRun(std::string& problem) {
   const int own = ::geteuid() == 0 ? CLONE_NEWNS : CLONE_NEWNS | CLONE_NEWUSER;
   if (::unshare(own) != 0) return failed("no mount namespace", problem);

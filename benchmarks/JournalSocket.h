@@ -5,18 +5,18 @@
 
 namespace tonewerk {
 
-// Where sd_journal_send() sends. The library's path is fixed, so where no journal runs, the process gets a
-// /run of its own with a socket of ours in it.
+// Prepares the socket to which sd_journal_send() sends. The library's path is fixed. Where no journal runs,
+// the process therefore gets a private /run, in which the benchmark makes the socket itself.
 struct JournalSocket {
   enum class Kind {
-    kReal,  // a running journal's
-    kOwn,   // nobody's yet: bind `path` and read it
-    kNone,  // neither is to be had
+    kReal,  // the socket of a running journal
+    kOwn,   // no socket yet: the caller binds kPath and reads from it
+    kNone,  // neither is possible
   };
 
   static constexpr const char* kPath = "/run/systemd/journal/socket";
 
-  // Call it before there are threads. `problem` says why there is none.
+  // Call it before any thread is started. `problem` gives the reason for kNone.
   [[nodiscard]] static Kind prepare(std::string& problem);
 };
 

@@ -9,10 +9,10 @@
 
 namespace tonewerk {
 
-// How long each of many calls took, in nanoseconds, the clock's own time included.
+// Records the duration of each of many calls, in nanoseconds, including the time of reading the clock.
 class Latencies {
  public:
-  // Touches the memory for so many, so that measuring does not.
+  // Touches the memory for `count` values now, so that page faults do not disturb the measurement.
   explicit Latencies(std::size_t count) : nanoseconds_(count) {}
 
   template <class Call>
@@ -28,7 +28,7 @@ class Latencies {
     std::sort(nanoseconds_.begin(), nanoseconds_.end());
   }
 
-  // After sort(). `share` of the calls took no longer, 1 for all.
+  // The duration that `share` of the calls did not exceed; 1 means all calls. Call sort() first.
   std::int64_t within(double share) const {
     if (nanoseconds_.empty()) return 0;
     const auto place = static_cast<std::size_t>(share * static_cast<double>(nanoseconds_.size()));

@@ -11,7 +11,7 @@
 namespace tonewerk {
 namespace {
 
-// One of each group and subgroup that is sampled.
+// All groups and subgroups that are sampled.
 constexpr std::array<std::string_view, 9> kGroups = {R"("group": "OrvaneAE2MCA")",
                                                      R"("group": "Speaker")",
                                                      R"("group": "Amplifier", "subgroup": "MCA")",
@@ -71,7 +71,7 @@ std::string channelText(std::size_t channel, std::int64_t time) {
 
 }  // namespace
 
-void PublishedDrivers::goOn() {
+void PublishedDrivers::publishNextValues() {
   ++time_;
   bytes_ = 0;
   for (std::size_t driver = 0; driver < drivers_; ++driver) {

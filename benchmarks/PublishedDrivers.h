@@ -8,23 +8,23 @@
 
 namespace tonewerk {
 
-// Drivers that publish channels in a directory: each has channels in all groups that are sampled, half of
-// them simple, a quarter histograms of eight buckets, a quarter with four states.
+// Writes the channel files of many drivers into a directory. Each driver has channels in all sampled groups:
+// half are simple, a quarter are histograms of eight buckets, a quarter have four states.
 class PublishedDrivers {
  public:
-  // The directory is there already.
+  // The directory must exist.
   PublishedDrivers(std::string directory, std::size_t drivers, std::size_t channelsOfEach)
       : directory_(std::move(directory)), drivers_(drivers), channelsOfEach_(channelsOfEach) {}
 
-  // Every driver puts a new file in place of its old one, in which every channel has gone on. Ends the
-  // process when it cannot.
-  void goOn();
+  // Replaces the file of every driver by one in which every channel has a new value. Ends the process when a
+  // file cannot be written.
+  void publishNextValues();
 
   std::size_t channels() const { return drivers_ * channelsOfEach_; }
-  // Of all files together.
+  // Size of all files together.
   std::size_t bytes() const { return bytes_; }
 
-  // Reads every file and does nothing with it; the bytes read.
+  // Reads every file without parsing it, and returns the number of bytes.
   std::size_t readFiles() const;
 
  private:

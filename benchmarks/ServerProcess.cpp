@@ -20,11 +20,11 @@ namespace tonewerk {
 namespace {
 
 constexpr std::chrono::milliseconds kStep{20};
-constexpr std::chrono::seconds kPatience{60};
+constexpr std::chrono::seconds kTimeout{60};
 
-// Longer than the store gathers a batch.
+// Longer than the store waits to fill a batch.
 constexpr int kIdleSteps = 15;
-// What a server that waits spends in a step.
+// The most processor time that an idle server uses in a step.
 constexpr ServerProcess::Processor kIdleTime = std::chrono::microseconds(200);
 
 const char* const kDirectoryVariables[] = {"RUNTIME_DIRECTORY", "STATE_DIRECTORY", "LOGS_DIRECTORY",
@@ -37,9 +37,9 @@ std::string textOfFile(const std::string& path) {
   return text.str();
 }
 
-// In the child. Only calls that may follow a fork.
-[[noreturn]] void become(const std::vector<char*>& command, int output) {
-  ::prctl(PR_SET_PDEATHSIG, SIGKILL);  // never outlives the benchmark
+// Runs in the child after fork(); only async-signal-safe calls are allowed.
+[[noreturn]] void execute(const std::vector<char*>& command, int output) {
+  ::prctl(PR_SET_PDEATHSIG, SIGKILL);  // the child never outlives the benchmark
   ::dup2(output, STDOUT_FILENO);
   ::dup2(output, STDERR_FILENO);
   ::execv(command[0], command.data());
@@ -67,13 +67,13 @@ void ServerProcess::start(const std::string& program, const std::vector<std::str
   command.push_back(nullptr);
   const int output = ::open((directory_ + "/output").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
   process_ = ::fork();
-  if (process_ == 0) become(command, output);
+  if (process_ == 0) execute(command, output);
   ::close(output);
   if (process_ < 0) throw std::runtime_error("cannot start " + program);
-  const auto giveUpAt = std::chrono::steady_clock::now() + kPatience;
+  const auto deadline = std::chrono::steady_clock::now() + kTimeout;
   while (!std::filesystem::exists(socketPath())) {
     if (hasEnded()) failWithOutput(program + " has ended");
-    if (std::chrono::steady_clock::now() > giveUpAt) failWithOutput(program + " does not listen");
+    if (std::chrono::steady_clock::now() > deadline) failWithOutput(program + " does not listen");
     std::this_thread::sleep_for(kStep);
   }
   waitUntilIdle();
@@ -95,7 +95,7 @@ std::map<std::string, ServerProcess::Processor> ServerProcess::processorTimeByTh
        std::filesystem::directory_iterator("/proc/" + std::to_string(process_) + "/task", error)) {
     std::string name = textOfFile(thread.path() / "comm");
     if (!name.empty()) name.pop_back();
-    // The first number: nanoseconds on a processor.
+    // The first number is the processor time in nanoseconds.
     times[name] += Processor(std::atoll(textOfFile(thread.path() / "schedstat").c_str()));
   }
   return times;
@@ -110,14 +110,14 @@ std::size_t ServerProcess::peakMemory() const {
 }
 
 void ServerProcess::waitUntilIdle() const {
-  const auto giveUpAt = std::chrono::steady_clock::now() + kPatience;
+  const auto deadline = std::chrono::steady_clock::now() + kTimeout;
   Processor before = processorTime();
   for (int idle = 0; idle < kIdleSteps;) {
     std::this_thread::sleep_for(kStep);
     const Processor now = processorTime();
     idle = now - before < kIdleTime ? idle + 1 : 0;
     before = now;
-    if (std::chrono::steady_clock::now() > giveUpAt) failWithOutput("the server does not come to rest");
+    if (std::chrono::steady_clock::now() > deadline) failWithOutput("the server does not come to rest");
   }
 }
 
@@ -133,9 +133,9 @@ bool ServerProcess::hasEnded() {
 void ServerProcess::stop() {
   if (process_ < 0) return;
   ::kill(process_, SIGTERM);
-  const auto giveUpAt = std::chrono::steady_clock::now() + kPatience;
+  const auto deadline = std::chrono::steady_clock::now() + kTimeout;
   while (!hasEnded()) {
-    if (std::chrono::steady_clock::now() > giveUpAt) ::kill(process_, SIGKILL);
+    if (std::chrono::steady_clock::now() > deadline) ::kill(process_, SIGKILL);
     std::this_thread::sleep_for(kStep);
   }
 }

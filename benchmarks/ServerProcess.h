@@ -10,14 +10,15 @@
 
 namespace tonewerk {
 
-// A server in a process of its own, with a temporary directory of its own, and what it has cost so far.
+// Runs a server in a process and a temporary directory of its own, and measures its cost.
 //
-// A failure throws std::runtime_error. Its end is the server's (SIGTERM, then SIGKILL) and the directory's.
+// A failure throws std::runtime_error. The destructor ends the server (SIGTERM, then SIGKILL) and removes the
+// directory.
 class ServerProcess {
  public:
   using Processor = std::chrono::nanoseconds;
 
-  // An empty directory for a server to come.
+  // Makes an empty directory for a server.
   ServerProcess();
   ServerProcess(const ServerProcess&) = delete;
   ServerProcess& operator=(const ServerProcess&) = delete;
@@ -26,17 +27,17 @@ class ServerProcess {
   const std::string& directory() const { return directory_; }
   std::string socketPath() const { return directory_ + "/reporting.sock"; }
 
-  // Starts it, all its directories being directory(), and waits until it listens at socketPath().
+  // Starts the server with directory() as all of its directories, and waits until it listens at socketPath().
   void start(const std::string& program, const std::vector<std::string>& arguments);
 
-  // Processor time of all its threads, the kernel's work for them included.
+  // Processor time of all its threads, in user and kernel mode.
   Processor processorTime() const;
-  // The same by thread name; of threads that are still there.
+  // The same by thread name, of the threads that still run.
   std::map<std::string, Processor> processorTimeByThread() const;
-  // The most memory it has had at once, in bytes.
+  // Largest resident memory so far, in bytes.
   std::size_t peakMemory() const;
 
-  // Waits until it has nothing left to do: queued work is done, the store's last batch written.
+  // Waits until the server is idle: queued work is done, and the store's last batch is written.
   void waitUntilIdle() const;
 
  private:

@@ -6,12 +6,12 @@
 
 namespace tonewerk {
 
-// The other side of what senders write: a process that reads and throws away. Ends with the object, or with
-// the process that made it.
+// Runs a process that reads what senders write and discards it. The process ends with the object, or with the
+// process that made it.
 class SocketDrain {
  public:
-  // Listens at `streamPath` for stream sockets, and takes the datagrams of `datagramPath` unless it is empty.
-  // Call it before there are threads.
+  // Listens for stream sockets at `streamPath`, and receives datagrams at `datagramPath` unless that is
+  // empty. Call it before any thread is started.
   SocketDrain(const std::string& streamPath, const std::string& datagramPath);
   SocketDrain(const SocketDrain&) = delete;
   SocketDrain& operator=(const SocketDrain&) = delete;

@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What a message costs in the core: normalised, judged, stored and delivered to every worker of a started
-// session, without a socket before it and a store behind it. How that grows with stored messages, keys and
-// sessions; what the payload's map costs by itself.
+// Measures the cost of a message in the core, without socket and store: the message is normalised, checked
+// for redundancy, stored and delivered to every worker of a started session. Shows how the cost grows with
+// stored messages, keys and sessions. Also measures the payload's map alone.
 
 #include <benchmark/benchmark.h>
 #include <chrono>
@@ -32,14 +32,15 @@ namespace tonewerk {
 namespace {
 
 constexpr AudioEventCategory kPlayback = 4;
-// Records made at a time, outside of what is measured.
+// Records made at a time, outside the measured time.
 constexpr std::size_t kBatch = 512;
-// Messages that a session stores beyond what it began with, before another takes its place.
+// Messages that are added to a session before it is replaced by a new one.
 constexpr std::size_t kMaxAdded = 16'384;
-// A client may keep 256 MiB; 100,000 messages of 64 keys are more, and what is not kept is not measured.
+// The usual limit for a client is 256 MiB. 100,000 messages of 64 keys need more, and messages that are not
+// kept would not be measured.
 constexpr std::size_t kUnbounded = std::size_t{1} << 40;
 
-// Doubles that cost what a quiet daemon's adapters cost, and keep nothing.
+// Test doubles with the cost of a quiet daemon's adapters. They keep nothing.
 class QuietLog final : public Log {
  public:
   bool isEnabled(std::string_view, LogLevel level) const override { return level >= LogLevel::kDefault; }
@@ -100,7 +101,7 @@ class QuietLinkReport final : public LinkReport {
   };
 };
 
-// Runs work where it is queued, so that what sinks' threads do is measured, too.
+// Runs work at once on the queueing thread, so that the work of the sinks' threads is measured too.
 class ImmediateQueues final : public SerialQueueFactory {
  public:
   std::unique_ptr<SerialQueue> makeSerialQueue(std::string name, QueuePriority) override {
@@ -156,7 +157,7 @@ class Core {
 
 using Record = std::shared_ptr<TWReportingSessionMessage>;
 
-// Makes messages of so many keys as a connection does: the keys are shared, the map is the message's own.
+// Makes messages of `keys` keys as a connection does: the keys are shared, and each message has its own map.
 class Messages {
  public:
   Messages(std::size_t keys, bool isChanging) : isChanging_(isChanging) {
@@ -196,8 +197,8 @@ void fill(TWReportingSession& session, std::size_t stored, std::size_t keys) {
   for (const Record& record : messages.records(stored)) session.sendMessage(record);
 }
 
-// Of `keys` keys to a session that stores `stored` messages, and some thousands more when sending stores
-// them.
+// Sends messages of `keys` keys to a session that stores `stored` messages, and up to kMaxAdded more when the
+// sent ones are stored.
 void sendMessage(benchmark::State& state, bool isChanging) {
   const auto stored = static_cast<std::size_t>(state.range(0));
   const auto keys = static_cast<std::size_t>(state.range(1));
@@ -234,7 +235,7 @@ void SendRedundant(benchmark::State& state) { sendMessage(state, false); }
 BENCHMARK(SendChanging)->TONEWERK_STORED_AND_KEYS;
 BENCHMARK(SendRedundant)->TONEWERK_STORED_AND_KEYS;
 
-// One message after the other to so many sessions in turn; each stores a few.
+// Sends one message after the other to the sessions in turn; each session stores only a few.
 void SendToSessions(benchmark::State& state) {
   constexpr std::size_t kKeys = 8;
   constexpr std::size_t kMaxMessages = 100'000;
@@ -261,8 +262,8 @@ void SendToSessions(benchmark::State& state) {
 }
 BENCHMARK(SendToSessions)->ArgName("sessions")->Arg(1)->Arg(1000);
 
-// What showing a received message to so many watchers adds; those that do not ask are full before long, and
-// each message then pushes one out.
+// Measures what showing a received message to watchers adds. A watcher that never fetches its messages is
+// soon full, and each new message then removes an old one.
 void NoteForWatchers(benchmark::State& state) {
   Core core;
   const auto session = core.makeSession(77);
@@ -281,7 +282,8 @@ void NoteForWatchers(benchmark::State& state) {
 }
 BENCHMARK(NoteForWatchers)->ArgName("watchers")->Arg(0)->Arg(1)->Arg(10);
 
-// The stop of a session that stores so many messages: sorting them, and every worker's report. Per stop.
+// Measures the stop of a session by its stored messages: sorting them, and every worker's report. Time per
+// stop.
 void Stop(benchmark::State& state) {
   const auto stored = static_cast<std::size_t>(state.range(0));
   Core core;
@@ -295,7 +297,7 @@ void Stop(benchmark::State& state) {
   state.SetItemsProcessed(state.iterations() * state.range(0));
   state.SetComplexityN(state.range(0));
 }
-// Its growth is shown beside n log n, which it must not pass.
+// Its growth is compared with n log n, which it must not exceed.
 BENCHMARK(Stop)
     ->ArgName("stored")
     ->Arg(1000)
@@ -304,7 +306,8 @@ BENCHMARK(Stop)
     ->Unit(benchmark::kMicrosecond)
     ->Complexity(benchmark::oNLogN);
 
-// What a stored message takes of the heap, payload, record and places included. The time is of no interest.
+// Measures the heap memory of a stored message: payload, record and container entries. The time does not
+// matter.
 void KeepMessages(benchmark::State& state) {
   constexpr std::size_t kStored = 100'000;
   const auto keys = static_cast<std::size_t>(state.range(0));
@@ -319,7 +322,7 @@ void KeepMessages(benchmark::State& state) {
 }
 BENCHMARK(KeepMessages)->ArgName("keys")->Arg(8)->Arg(64)->Iterations(1)->Unit(benchmark::kMillisecond);
 
-// A payload's map by itself.
+// The payload's map alone.
 void MakePayload(benchmark::State& state) {
   Messages messages(static_cast<std::size_t>(state.range(0)), true);
   for (auto _ : state) benchmark::DoNotOptimize(messages.payload());

@@ -1,10 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What the driver statistics of a session cost: the snapshot of 10,000 published channels as it starts and
-// their report as it stops, beside reading the same sources and doing nothing with them, and beside what they
-// may cost. Every file changes before each reading. Ends with 1 when the limit is passed.
+// Measures the driver statistics of a session: the snapshot of 10,000 published channels at its start and
+// their report at its stop. Compares them with reading the same sources without using them, and with a limit.
+// Every file changes before each reading. Exits with 1 when the limit is exceeded.
 //
-//   tonewerk_driver_statistics_benchmark [REPETITIONS]    11 unless given; medians are printed
+//   tonewerk_driver_statistics_benchmark [REPETITIONS]    default: 11; medians are printed
 
 #include <algorithm>
 #include <cstdio>
@@ -19,7 +19,7 @@
 
 #include "PublishedDrivers.h"
 #include "driver/TWReportingDriverUtility.h"
-#include "platform/Log.h"
+#include "platform/LogCategory.h"
 #include "platform/linux/LinuxPlatform.h"
 #include "platform/linux/channels/LinuxChanmeter.h"
 #include "platform/linux/directories/Directories.h"
@@ -63,7 +63,7 @@ double medianOf(std::vector<double> costs) {
   std::exit(2);
 }
 
-// All channels of a directory under one subscription.
+// Subscribes to all channels of a directory.
 class AllChannels {
  public:
   AllChannels(const std::string& directory, const LogCategory& log) : chanmeter_(directory, log) {
@@ -83,7 +83,8 @@ class AllChannels {
   std::optional<ChanmeterError> error_;
 };
 
-// Both readings of a session.
+// Costs in milliseconds. A session reads the channels twice, and `files` and `sources` are for two readings
+// too.
 struct Costs {
   std::vector<double> files;
   std::vector<double> sources;
@@ -96,13 +97,13 @@ class Benchmark {
  public:
   Benchmark() {
     std::filesystem::create_directory(channelsDirectory_);
-    drivers_.goOn();
-    utility_ = &context_.singletons().get<TWReportingDriverUtility>();  // that of every session
+    drivers_.publishNextValues();
+    utility_ = &context_.singletons().get<TWReportingDriverUtility>();  // the one that all sessions share
     all_.emplace(channelsDirectory_, log_);
   }
 
   void repeat() {
-    drivers_.goOn();
+    drivers_.publishNextValues();
     double files = costOf([&] { readFiles(); });
     double sources = costOf([&] { all_->read(); });
     TWReportingDriverUtility::Snapshot snapshot;
@@ -112,7 +113,7 @@ class Benchmark {
     session->setServiceType(kServiceTest);
     session->start();
 
-    drivers_.goOn();
+    drivers_.publishNextValues();
     files += costOf([&] { readFiles(); });
     sources += costOf([&] { all_->read(); });
     const double second = costOf([&] { utility_->sendDriverLogsForSession(session.get(), &snapshot); });
@@ -146,7 +147,7 @@ class Benchmark {
     if (drivers_.readFiles() != drivers_.bytes()) fail("files are not whole");
   }
 
-  // Every channel but those whose value stood still, which none's does.
+  // Every channel changes before each reading, so the report must contain all of them.
   void check(const TWReportingSession& session) const {
     std::size_t entries = 0;
     std::size_t messages = 0;
@@ -163,7 +164,7 @@ class Benchmark {
   TemporaryDirectory directory_;
   const std::string channelsDirectory_ = directory_.path("channels");
   PublishedDrivers drivers_{channelsDirectory_, kDrivers, kChannelsOfEach};
-  // The daemon's own adapters, but for the sinks.
+  // The daemon's own adapters, except the sinks.
   LinuxPlatform linux_{{.runtime = directory_.path(),
                         .state = directory_.path("state"),
                         .logs = directory_.path("logs"),

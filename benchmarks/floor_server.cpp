@@ -1,10 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // The floor of the ingest benchmark: a server that reads the same bytes from the same kind of socket, decodes
-// them with the same library and throws them away. It answers every request with the smallest response there
-// is, so that both sides of the comparison pay for the same way back.
+// them with the same library and discards them. It answers every request with the smallest possible response,
+// so that both servers have the cost of answering.
 //
-//   tonewerk_floor_server SOCKET     until SIGTERM
+//   tonewerk_floor_server SOCKET     runs until SIGTERM
 
 #include <cstdint>
 #include <cstdlib>
@@ -25,7 +25,7 @@
 namespace tonewerk {
 namespace {
 
-constexpr std::size_t kReadBytes = std::size_t{64} * 1024;  // the daemon's
+constexpr std::size_t kReadBytes = std::size_t{64} * 1024;  // as the daemon does
 constexpr std::uint64_t kListener = 0;
 
 class Connection {
@@ -34,7 +34,7 @@ class Connection {
 
   int fileDescriptor() const { return socket_.get(); }
 
-  // One read, as in the daemon. False when the peer has gone or makes no sense.
+  // Reads once, as the daemon does. False when the peer is gone or has sent invalid bytes.
   bool handleReadable() {
     unpacker_.reserve_buffer(kReadBytes);
     const ssize_t count = ::recv(socket_.get(), unpacker_.buffer(), kReadBytes, MSG_DONTWAIT);
@@ -60,7 +60,7 @@ class Connection {
 
   bool send() {
     if (answers_.size() == 0) return true;
-    // The benchmark's clients keep so few requests under way that the answers always fit into the socket.
+    // The benchmark's clients have so few pending requests that the answers always fit into the socket.
     const ssize_t sent = ::send(socket_.get(), answers_.data(), answers_.size(), MSG_NOSIGNAL);
     const bool isSent = sent == static_cast<ssize_t>(answers_.size());
     answers_.clear();
@@ -97,7 +97,7 @@ void serve(const FileDescriptor& listener) {
         epoll.add(connection->fileDescriptor(), next, EPOLLIN);
         connections.emplace(next++, std::move(connection));
       } else if (!connections.at(event.identifier)->handleReadable()) {
-        connections.erase(event.identifier);  // closing it takes it out of the epoll
+        connections.erase(event.identifier);  // closing the socket removes it from the epoll
       }
     }
   }

@@ -1,12 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What a message costs the daemon end to end, through its socket, beside the floor: a server that decodes the
-// same bytes and throws them away. Both are measured in turns, in the same run, and compared by processor
-// time.
+// Measures the cost of a message for the daemon end to end, through its socket, and compares it with the
+// floor: a server that decodes the same bytes and discards them. Both are measured alternately in the same
+// run, and compared by processor time.
 //
 //   tonewerk_ingest_benchmark [REPETITIONS [SCENARIO]]
 //
-// SCENARIO: only those whose name contains it.
+// SCENARIO: run only the scenarios whose name contains this text.
 
 #include <algorithm>
 #include <cstdio>
@@ -57,7 +57,7 @@ struct Measured {
   std::vector<IngestCost> floor;
 };
 
-// The middle one by processor time.
+// Returns the median by processor time.
 const IngestCost& median(std::vector<IngestCost>& costs) {
   const auto middle = costs.begin() + static_cast<std::ptrdiff_t>(costs.size() / 2);
   std::nth_element(costs.begin(), middle, costs.end(), [](const IngestCost& a, const IngestCost& b) {
@@ -101,8 +101,8 @@ int run(std::size_t repetitions, std::string_view wanted) {
   for (std::size_t repetition = 0; repetition < repetitions; ++repetition) {
     for (Measured& measured : all) {
       std::fprintf(stderr, "%zu of %zu: %s\n", repetition + 1, repetitions, measured.scenario.name.c_str());
-      measured.floor.push_back(measureIngest(measured.scenario, IngestSide::kFloor));
-      measured.daemon.push_back(measureIngest(measured.scenario, IngestSide::kDaemon));
+      measured.floor.push_back(measureIngest(measured.scenario, IngestServer::kFloor));
+      measured.daemon.push_back(measureIngest(measured.scenario, IngestServer::kDaemon));
     }
   }
   printCosts(all);

@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What a message costs the thread that sends it: through a sender's ring, by a write to a socket, and by the
-// systemd journal's client library, in turns.
+// Measures the cost of a message for the thread that sends it: through a sender's ring, by a write to a
+// socket, and by the systemd journal's client library, alternately.
 //
-//   send_benchmark [MESSAGES]     200,000 unless given
+//   send_benchmark [MESSAGES]     default: 200,000
 
 #include <array>
 #include <cinttypes>
@@ -27,17 +27,17 @@
 namespace tonewerk {
 namespace {
 
-constexpr std::size_t kUsualMessages = 200'000;
+constexpr std::size_t kDefaultMessages = 200'000;
 constexpr std::size_t kWarmUp = 2'000;
-// A running journal keeps what it is sent, so it is sent less.
+// A running journal keeps its messages, so it gets only one for every 20 measured messages.
 constexpr std::size_t kJournalShare = 20;
-constexpr int kPatienceMs = 10'000;
+constexpr int kTimeoutMs = 10'000;
 constexpr double kTime = 1763633999.25;
 
 constexpr std::int64_t kMaxMedian = 100;
 constexpr std::int64_t kMax999 = 1'000;
 
-// What a playing stream says about itself.
+// Builds a message that describes a playing stream.
 void build(twr_payload& payload, unsigned char* memory, std::size_t size, std::int64_t position) {
   twr_payload_init(&payload, memory, size);
   twr_put_bool(&payload, "session_output_running", 1);
@@ -77,7 +77,7 @@ void printRow(const char* name, Latencies& latencies) {
   std::printf(" %" PRId64 " |\n", latencies.within(1));
 }
 
-void judge(const char* aim, bool isMet) {
+void printVerdict(const char* aim, bool isMet) {
   std::printf("%s: %s\n", aim, isMet ? "met" : "NOT met in this run");
 }
 
@@ -94,7 +94,7 @@ class SendBenchmark {
   ~SendBenchmark() {
     twr_sender_close(sender_);
     twr_session_destroy(session_, nullptr, nullptr);
-    twr_client_destroy(client_, kPatienceMs);
+    twr_client_destroy(client_, kTimeoutMs);
   }
 
   bool open(const std::string& socketPath) {
@@ -107,7 +107,7 @@ class SendBenchmark {
     sender_ = twr_sender_open(session_, TWR_MOST_RING_BYTES);
     const std::optional<sockaddr_un> address = unixAddressOf(socketPath);
     socket_.reset(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
-    return sender_ != nullptr && twr_client_connect(client_, kPatienceMs) == TWR_OK && address &&
+    return sender_ != nullptr && twr_client_connect(client_, kTimeoutMs) == TWR_OK && address &&
            ::connect(socket_.get(), generic(*address), sizeof(*address)) == 0;
   }
 
@@ -124,8 +124,8 @@ class SendBenchmark {
           frame, std::nullopt,
           {TWR_CATEGORY_PLAYBACK, TWR_TYPE_GENERIC, kTime, 0, payload.entries, {payload.bytes, payload.size}},
           0, {&id, 1});
-      // The sender's turns come each after one of the others, which leave it little in the caches: as in an
-      // audio callback, which has had other things to do.
+      // Each measured call of the sender follows other work, which leaves little of its data in the caches.
+      // This is as in an audio callback, which does other work before.
       table.clock.measure([] {});
       table.socket.measure([&] { ::send(socket_.get(), frame.data(), frame.size(), MSG_NOSIGNAL); });
       table.send.measure(
@@ -193,9 +193,9 @@ int runAll(std::size_t messages) {
     std::printf("\nNo journal to compare with (%s).\n", problem.c_str());
   }
   std::printf("\n");
-  judge("median at most 100 ns", table.send.within(0.5) <= kMaxMedian);
-  judge("99.9th percentile at most 1 us", table.send.within(0.999) <= kMax999);
-  judge("at no percentile more than the socket", isNeverMore(table.send, table.socket));
+  printVerdict("median at most 100 ns", table.send.within(0.5) <= kMaxMedian);
+  printVerdict("99.9th percentile at most 1 us", table.send.within(0.999) <= kMax999);
+  printVerdict("at no percentile more than the socket", isNeverMore(table.send, table.socket));
   if (benchmark.dropped() == 0) return 0;
   std::fprintf(stderr, "send_benchmark: %" PRIu64 " messages found the ring full; these are no sends\n",
                benchmark.dropped());
@@ -207,5 +207,5 @@ int runAll(std::size_t messages) {
 
 int main(int count, char** arguments) {
   const long given = count > 1 ? std::atol(arguments[1]) : 0;
-  return tonewerk::runAll(given > 0 ? static_cast<std::size_t>(given) : tonewerk::kUsualMessages);
+  return tonewerk::runAll(given > 0 ? static_cast<std::size_t>(given) : tonewerk::kDefaultMessages);
 }

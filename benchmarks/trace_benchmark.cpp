@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What signposts cost a program, and how long a test waits for its file after the stop. Prints a table.
+// Measures the cost of signposts for a program, and how long a test waits for its file after the stop. Prints
+// a table.
 
 #include <algorithm>
 #include <chrono>
@@ -20,7 +21,7 @@ namespace {
 using Clock = std::chrono::steady_clock;
 
 constexpr char kProbes[] = R"({"name": "benchmark", "type": "interval"})";
-// A burst that the tracer's buffers take, and a pause in which they are emptied.
+// A burst that fits into the tracer's buffers, and a pause in which they are emptied.
 constexpr std::uint64_t kBurst = 5'000;
 constexpr std::chrono::milliseconds kPause{20};
 
@@ -28,7 +29,8 @@ double secondsSince(Clock::time_point begin) {
   return std::chrono::duration<double>(Clock::now() - begin).count();
 }
 
-// Passes so many pairs, in bursts when `pauses`, and gives the seconds that they took without the pauses.
+// Executes `pairs` pairs, in bursts when `pauses` is true, and returns their time in seconds without the
+// pauses.
 double pass(std::uint64_t pairs, bool pauses) {
   double seconds = 0.0;
   for (std::uint64_t done = 0; done < pairs;) {

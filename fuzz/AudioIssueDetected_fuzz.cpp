@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Reads the input as a metric record; what was read must read back the same.
+// Reads the input as a metric record. A record that was written and read again must be the same.
 #include <cstddef>
 #include <cstdint>
 #include <cstdlib>

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Reads the input as a file of driver channels; what was read answers every question about it, and takes a
-// difference to itself.
+// Reads the input as a file of driver channels. Then calls every function of its samples, and takes the
+// difference of the file with itself.
 #include <cstddef>
 #include <cstdint>
 #include <cstdlib>
@@ -34,7 +34,7 @@ void ask(const ChanmeterSample& sample) {
     expect(isUtf8(sample.stateName(index)));
 }
 
-// Unless something is counted below zero, nothing changes from a time to the same time.
+// The difference of a file with itself is zero in its simple channels and in its states.
 void expectNoChange(const ChanmeterRecords& records) {
   const ChanmeterRecords changes = chanmeterDifference(records, records);
   expect(changes.size() == records.size());

@@ -1,9 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What a client may send: its bytes, cut into pieces, become frames, and a frame's arguments are held against
-// a method.
+// Reads the input as the bytes of a client: they are cut into pieces and read as frames, and the arguments of
+// each frame are checked against a method.
 //
-// The input's first byte chooses the pieces' length (0: all at once), the second byte the method.
+// The input's first byte is the length of the pieces (0: all at once), the second byte chooses the method.
 #include <cstddef>
 #include <cstdint>
 #include <cstdlib>
@@ -38,7 +38,7 @@ void expect(bool condition) {
   if (!condition) std::abort();
 }
 
-// Every text that comes out of the reader is UTF-8.
+// Checks that every text from the reader is UTF-8.
 void expectSound(const Value& value) {
   if (const SharedString* text = value.asString()) expect(isUtf8(*text));
   if (const ValueArray* array = value.asArray()) {
@@ -52,11 +52,12 @@ void expectSound(const Value& value) {
   }
 }
 
-// What was read can be written, and reads as the same again.
+// Checks that a frame can be written, and that reading it again gives the same frame.
 void expectRoundTrip(const RpcFrame& frame) {
   std::string written;
   RpcWriter(written).request(frame.identifier, frame.method, frame.arguments);
-  if (written.size() > kMaxFrameBytes) return;  // a float of four bytes is written as a double of eight
+  if (written.size() > kMaxFrameBytes)
+    return;  // may grow: a float of four bytes is written as a double of eight
   RpcStrings texts;
   RpcFrameReader reader(texts);
   std::string_view bytes = written;

@@ -1,6 +1,6 @@
 #!/usr/bin/env python3
 # SPDX-License-Identifier: Apache-2.0
-"""Writes the seeds in RpcFrameReader/: a piece length, a method's number, then a client's bytes."""
+"""Writes the seeds in RpcFrameReader/. Each is a piece length, a method's number and the bytes of a client."""
 import pathlib
 
 REQUEST_OF_M = "94 00 01 A1 6D "

@@ -5,7 +5,7 @@
 #include <optional>
 #include <string_view>
 
-#include "platform/LogLine.h"
+#include "platform/Log.h"
 #include "session/TWReportingSessionMessage.h"
 #include "values/Value.h"
 

@@ -9,7 +9,7 @@
 #include <utility>
 #include <vector>
 
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "platform/linux/socket/UnixSocketListener.h"
 #include "protocol/Requests.h"
 #include "support/memory/MemoryLog.h"

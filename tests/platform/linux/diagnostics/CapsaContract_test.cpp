@@ -5,7 +5,7 @@
 #include <gmock/gmock.h>
 #include <memory>
 
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "platform/linux/diagnostics/DiagnosticsStore.h"
 #include "platform/linux/diagnostics/LinuxCapsa.h"
 #include "platform/linux/threads/ThreadQueueFactory.h"

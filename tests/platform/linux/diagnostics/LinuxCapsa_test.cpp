@@ -10,7 +10,7 @@
 #include <optional>
 #include <thread>
 
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "platform/linux/diagnostics/CapturePolicy.h"
 #include "platform/linux/diagnostics/DiagnosticsStore.h"
 #include "platform/linux/json/NlohmannJsonService.h"

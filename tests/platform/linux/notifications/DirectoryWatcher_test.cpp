@@ -14,7 +14,7 @@
 #include <unistd.h>
 #include <vector>
 
-#include "support/Stranger.h"
+#include "support/OtherUser.h"
 #include "support/TemporaryDirectory.h"
 #include "support/memory/MemoryLog.h"
 
