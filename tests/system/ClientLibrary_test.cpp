@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The client library and the daemon itself, which may go away and come back.
+// Tests the client library with the real daemon, which may go away and come back.
 #include <condition_variable>
 #include <cstdint>
 #include <functional>
@@ -24,14 +24,14 @@ using ::testing::SizeIs;
 constexpr int kPatienceMs = 30'000;
 constexpr const char* kEvent = "com.orvane.longformaudio.Playback.Activate";
 
-// One answer, for another thread to wait for.
+// Holds one answer, for which another thread can wait.
 class OneAnswer {
  public:
   static void take(void* self, const twr_answer* answer) { static_cast<OneAnswer*>(self)->take(*answer); }
 
   twr_status wait() {
     std::unique_lock lock(mutex_);
-    EXPECT_TRUE(changed_.wait_for(lock, kSystemPatience, [&] { return isThere_; }));
+    EXPECT_TRUE(changed_.wait_for(lock, kSystemTimeout, [&] { return isThere_; }));
     return status_;
   }
   bool isThere() {
@@ -126,7 +126,7 @@ TEST_F(ClientLibraryTest, MakesItsSessionsAgainAfterTheDaemonsDeathAndSaysWhatIt
   ASSERT_EQ(events.size(), 2 + static_cast<std::size_t>(kept));
   for (std::size_t at = 0; at < events.size(); ++at) {
     EXPECT_EQ(events[at].at("number"), at);
-    // Its type is in the event's name; that it was started, in that there is one.
+    // The event's name shows the service type. That the event exists shows that the session was started.
     EXPECT_EQ(events[at].at("HostApplicationDisplayID"), "com.example.player");
     EXPECT_EQ(events[at].contains("twreporting_dropped"), at + 1 == events.size());
   }
@@ -154,7 +154,7 @@ TEST_F(ClientLibraryTest, ReportsThroughADaemonThatComesLater) {
 TEST_F(ClientLibraryTest, AsksWhatCanBeAsked) {
   ASSERT_TRUE(daemon.start());
   makeSession();
-  // The daemon answers the question about 0 twice; the second answer is nobody's.
+  // The daemon answers the request about identifier 0 twice; the second answer belongs to no request.
   OneAnswer nothing;
   OneAnswer type;
   OneAnswer valid;
@@ -167,7 +167,7 @@ TEST_F(ClientLibraryTest, AsksWhatCanBeAsked) {
   ASSERT_EQ(twr_client_validate(client, 78, OneAnswer::take, &invalid), TWR_OK);
   ASSERT_EQ(twr_client_get_all_reporters(client, OneAnswer::take, &all), TWR_OK);
   ASSERT_EQ(twr_client_request(client, "noSuchMethod", nullptr, OneAnswer::take, &unknown), TWR_OK);
-  // What is refused is answered at once, before what has to be done first.
+  // A refused request is answered at once, before earlier requests that are still queued.
   EXPECT_EQ(unknown.wait(), TWR_REFUSED);
   for (OneAnswer* answer : {&nothing, &type, &valid, &invalid, &all}) EXPECT_EQ(answer->wait(), TWR_OK);
   EXPECT_EQ(nothing.serviceType(), TWR_SERVICE_UNKNOWN);
@@ -199,7 +199,7 @@ TEST_F(ClientLibraryTest, IsToldOfARunsEndHoweverItEnds) {
   EXPECT_EQ(byDestroy.wait(), TWR_OK);
 }
 
-// A flush waits for no answer; the end does, as the daemon answers nobody who has hung up.
+// A flush does not wait for answers. The end does, because the daemon does not answer a closed connection.
 TEST_F(ClientLibraryTest, IsAnsweredBeforeItIsDestroyed) {
   ASSERT_TRUE(daemon.start());
   makeSession();

@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What one connection may take of the daemon, one below and one above, and what the others notice of it:
-// nothing.
+// Tests the limits of one connection, at each limit and one above it. Other connections must notice nothing.
 #include <poll.h>
 #include <string>
 #include <thread>
@@ -24,15 +23,16 @@ using ::testing::SizeIs;
 constexpr auto kMaxSessions = static_cast<ReporterID>(TWReportingClientServerInstance::kMaxSessions);
 constexpr ReporterID kFirst = 1000;
 
-// So many that a list of them takes 4.5 KiB; and requests for it whose answers pass every bound many times.
+// A list of this many sessions takes 4.5 KiB. This many requests for the list have answers far above every
+// limit.
 constexpr ReporterID kSessions = 512;
 constexpr std::uint32_t kFarTooMany = 100'000;
 
 class ConnectionLimitsTest : public DaemonTest {
  protected:
   void SetUp() override {
-    daemon.setEnvironment("TONEWERK_LOG", "default");  // what follows would be many lines
-    // What is freed counts as free, also under a sanitizer.
+    daemon.setEnvironment("TONEWERK_LOG", "default");  // otherwise the log would have many lines
+    // Makes a sanitizer return freed memory earlier.
     daemon.setEnvironment("ASAN_OPTIONS", "quarantine_size_mb=1");
     ASSERT_TRUE(daemon.start());
   }
@@ -45,12 +45,12 @@ class ConnectionLimitsTest : public DaemonTest {
   static std::int64_t errorCodeOf(const Answer& answer) { return answer.error ? answer.error->code : 0; }
 };
 
-// A client that sends requests with vast answers and reads none.
+// A client that sends requests with large answers and reads none of them.
 class UnreadingClient {
  public:
   explicit UnreadingClient(const std::string& path) : client_(path) {}
 
-  // Sends until the daemon has taken nothing for a while; false when it takes everything.
+  // Sends until the daemon has read nothing for a while. False when the daemon read all requests.
   bool sendUntilNothingIsTaken(std::uint32_t mostRequests) {
     while (sent_ < mostRequests) {
       if (rest_.empty()) rest_ = packed::request(sent_++, "getAllReporters", {});
@@ -60,7 +60,7 @@ class UnreadingClient {
     return false;
   }
 
-  // Reads every answer, and then sends what is left of the last request.
+  // Reads every answer, and then sends the rest of the last request.
   std::uint32_t readAll() {
     std::uint32_t read = 0;
     const std::uint32_t whole = rest_.empty() ? sent_ : sent_ - 1;
@@ -85,7 +85,7 @@ class UnreadingClient {
 
   RawClient client_;
   std::uint32_t sent_ = 0;
-  std::string rest_;  // of the last request
+  std::string rest_;  // bytes of the last request that are not sent yet
 };
 
 TEST_F(ConnectionLimitsTest, AConnectionHoldsSoManySessionsAndNotOneMore) {
@@ -96,9 +96,9 @@ TEST_F(ConnectionLimitsTest, AConnectionHoldsSoManySessionsAndNotOneMore) {
   EXPECT_EQ(refusal.error.value_or(ReplyError()).domain, "com.orvane.tonewerk.messaging");
   EXPECT_THAT(client.allReporters(), SizeIs(kMaxSessions));
 
-  client.create(kFirst);  // replaces one
+  client.create(kFirst);  // replaces a session
   DaemonClient other = connect();
-  other.create(kFirst + kMaxSessions);  // the bound is each connection's own
+  other.create(kFirst + kMaxSessions);  // each connection has its own limit
   client.destroy(kFirst);
   client.create(kFirst + kMaxSessions);
   EXPECT_EQ(errorCodeOf(client.call("createReportingSession", {Value(kFirst)})), 3);
@@ -140,7 +140,7 @@ TEST_F(ConnectionLimitsTest, AClientThatReadsNothingIsNotReadFromUntilItReadsAnd
   createSessions(holder, kSessions);
   UnreadingClient unreading(daemon.socketPath());
   ASSERT_TRUE(unreading.sendUntilNothingIsTaken(kFarTooMany));
-  // The others are served as ever.
+  // Other clients are served as before.
   EXPECT_THAT(holder.allReporters(), SizeIs(kSessions));
   DaemonClient newcomer = connect();
   newcomer.create(5, 7);
@@ -161,7 +161,7 @@ TEST_F(ConnectionLimitsTest, ClientsThatNeverReadEndWithoutHarmToOthers) {
     ASSERT_TRUE(unreading.back()->sendUntilNothingIsTaken(kFarTooMany));
   }
   EXPECT_THAT(holder.allReporters(), SizeIs(kSessions));
-  // 4 MiB of answers each, and what growing to that leaves behind.
+  // 4 MiB of answers each, and the memory that is left over from growing to that size.
   EXPECT_LT(daemon.residentBytes(), before + unreading.size() * 32 * 1024 * 1024);
   unreading.clear();
   EXPECT_THAT(holder.allReporters(), SizeIs(kSessions));
@@ -171,7 +171,7 @@ TEST_F(ConnectionLimitsTest, ConnectionsThatComeAndGoLeaveNothingBehind) {
   DaemonClient bystander = connect();
   bystander.create(1, 7);
   bystander.start(1);
-  // Once it has recorded that somebody came and went, it has its own files open.
+  // After the first recorded connection the daemon has all its own files open.
   { DaemonClient(daemon.socketPath()).create(2); }
   ASSERT_TRUE(waitUntil([&] { return !RecordedEvents(daemon.storePath()).names().empty(); }));
   const std::size_t atRest = daemon.openDescriptors();

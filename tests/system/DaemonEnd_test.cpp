@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// How the daemon ends, in order and otherwise, and what is in the store afterwards.
+// Tests how the daemon ends, in order and otherwise, and what the store then contains.
 #include <filesystem>
 #include <signal.h>
 #include <sqlite3.h>
@@ -31,7 +31,7 @@ class DaemonEndTest : public RunningDaemonTest {
     return RecordedEvents(daemon.storePath()).named(name);
   }
 
-  // A started session that has got a message.
+  // Starts a session and sends it a message.
   void startReporting(DaemonClient& client, ReporterID reporterID = kSession) {
     client.create(reporterID, kLongFormAudio);
     client.start(reporterID);
@@ -51,7 +51,7 @@ class DaemonEndBySignalTest : public DaemonEndTest, public ::testing::WithParamI
 TEST_P(DaemonEndBySignalTest, EveryStartedSessionIsStoppedAndReported) {
   DaemonClient first = connect();
   DaemonClient second = connect();
-  // Before there is a started session, so that it makes one of its own.
+  // Sent before there is a started session, so that the daemon makes a single-message session.
   first.send({{"alone", 1}}, kPlayback, kTypeStart, {});
   startReporting(first);
   startReporting(first, 78);
@@ -62,7 +62,7 @@ TEST_P(DaemonEndBySignalTest, EveryStartedSessionIsStoppedAndReported) {
   EXPECT_THAT(events(kMessage), SizeIs(3));
   EXPECT_THAT(events(kSummary), SizeIs(3));
   EXPECT_THAT(events(kSingleMessage), SizeIs(1));
-  // It has no workers that report at its stop, so that only the log tells of it.
+  // The single-message session has no workers that report at its stop, so only the log shows its end.
   EXPECT_EQ(logLinesWith("ending session. reporterID=1"), 1U);
   EXPECT_TRUE(first.waitForEnd());
   EXPECT_TRUE(second.waitForEnd());
@@ -141,7 +141,7 @@ TEST_F(DaemonEndTest, AfterAKillTheNextDaemonGoesOnWithTheSameStoreAndSocket) {
   expectSoundStore();
 }
 
-// Somebody's write lock on the store, which the daemon's last rows have to wait for.
+// Holds a write lock on the store, for which the daemon's last rows must wait.
 class StoreLock {
  public:
   explicit StoreLock(const std::string& path) {
@@ -161,7 +161,7 @@ class StoreLock {
 
 class DaemonSecondSignalTest : public DaemonEndTest {
  protected:
-  // SIGTERM while the last rows cannot be written for a while, then SIGINT; the exit status.
+  // Sends SIGTERM while the last rows cannot be written, then SIGINT. Returns the exit status.
   std::optional<int> endByTwoSignals() {
     DaemonClient client = connect();
     startReporting(client);
@@ -170,7 +170,7 @@ class DaemonSecondSignalTest : public DaemonEndTest {
     EXPECT_TRUE(lock.isHeld());
     client.send({{"a", 2}}, kPlayback, kTypeStart, {kSession});
     daemon.process().signal(SIGTERM);
-    EXPECT_TRUE(client.waitForEnd());  // the first has come in
+    EXPECT_TRUE(client.waitForEnd());  // the first signal has taken effect
     return endBy(SIGINT);
   }
 };
@@ -178,7 +178,7 @@ class DaemonSecondSignalTest : public DaemonEndTest {
 TEST_F(DaemonSecondSignalTest, ASecondSignalEndsItAtOnce) {
   constexpr int kTries = 5;
   std::optional<int> status = endByTwoSignals();
-  // On a busy machine it may have given the rows up and have ended by itself before the second came.
+  // On a busy machine the daemon may have dropped the rows and ended by itself before the second signal.
   for (int at = 1; at < kTries && status == 0; ++at) {
     ASSERT_TRUE(daemon.start());
     status = endByTwoSignals();

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What the daemon writes to standard error.
+// Tests the lines that the daemon writes to standard error.
 #include <regex>
 #include <set>
 #include <sstream>
@@ -22,7 +22,7 @@ using ::testing::Not;
 
 class DaemonLogTest : public DaemonTest {
  protected:
-  // Starts it, has a client come and go, and stops it.
+  // Starts the daemon, connects and disconnects a client, and stops the daemon.
   void runWith(const std::string& threshold) {
     daemon.setEnvironment("TONEWERK_LOG", threshold);
     ASSERT_TRUE(daemon.start());
@@ -92,14 +92,14 @@ TEST_F(DaemonLogTest, OneCategoryCanBeWatchedAlone) {
   EXPECT_EQ(logLinesWith("Z info twrs "), 0U);
 }
 
-// Where the reports go, and that they went.
+// The two lines say where the reports go and that they were written.
 TEST_F(DaemonLogTest, ASessionsLifeTakesTwoLinesAndNoneIsAnError) {
   daemon.setEnvironment("TONEWERK_LOG", "");
   ASSERT_TRUE(daemon.start());
   std::size_t before = 0;
   {
     DaemonClient client = connect();
-    client.allReporters();  // answered once the daemon has said all that it says at its start
+    client.allReporters();  // answered after all log lines of the start
     before = daemon.log().size();
     client.create(77, 7);
     client.setConfiguration(77, {{"HostApplicationDisplayID", "com.example.player"}});

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The daemon as a program: its options, where it puts what it makes, which socket it listens on.
+// Tests the daemon as a program: its options, where it puts its files, which socket it listens on.
 #include <filesystem>
 #include <map>
 #include <signal.h>
@@ -23,16 +23,16 @@ using ::testing::StartsWith;
 bool answersAt(const std::string& socketPath) {
   ReportingClient client;
   std::error_code error = client.connect({socketPath});
-  return !error && client.call("getAllReporters", {}, kSystemPatience, error).has_value();
+  return !error && client.call("getAllReporters", {}, kSystemTimeout, error).has_value();
 }
 
-// The daemon without the fixture's directories.
+// Runs the daemon without the fixture's directories.
 class DaemonStartTest : public ::testing::Test {
  protected:
   void TearDown() override { expectNoSanitizerReport(textOfFile(errorPath())); }
 
   bool start(const ChildCommand& command) { return process.start(command, outputPath(), errorPath()); }
-  // Runs it to its end.
+  // Runs the daemon to its end.
   std::optional<int> run(const std::vector<std::string>& arguments) {
     return start({TONEWERK_DAEMON_PATH, arguments, {}}) ? process.wait() : std::nullopt;
   }
@@ -100,7 +100,7 @@ TEST_F(DaemonStartTest, ARuntimeDirectoryThatCannotBeMadeIsSaid) {
 
 class DaemonSocketTest : public RunningDaemonTest {
  protected:
-  // Another daemon in the same directories; its log is its own.
+  // Another daemon in the same directories, with a log of its own.
   std::optional<int> runSecond() {
     const ChildCommand command{TONEWERK_DAEMON_PATH,
                                {},
@@ -148,7 +148,7 @@ TEST_F(DaemonSocketTest, ASocketThatSomebodyElseMadeMeanwhileIsLeftAlone) {
   EXPECT_TRUE(std::filesystem::is_directory(daemon.socketPath()));
 }
 
-// A daemon that is passed its socket as the service manager does it.
+// Passes the daemon its socket as the service manager does.
 class SocketActivationTest : public DaemonStartTest {
  protected:
   std::string socketPath() const { return path("passed.sock"); }
@@ -172,7 +172,7 @@ TEST_F(SocketActivationTest, APassedSocketIsUsedAndNoOtherMade) {
   EXPECT_FALSE(std::filesystem::exists(path("runtime/reporting.sock")));
   EXPECT_THAT(textOfFile(errorPath()), HasSubstr("listening on the socket that systemd passed"));
   EXPECT_EQ(stop(), 0);
-  EXPECT_TRUE(std::filesystem::exists(socketPath()));  // the service manager's to remove
+  EXPECT_TRUE(std::filesystem::exists(socketPath()));  // only the service manager removes it
 }
 
 TEST_F(SocketActivationTest, TheFirstConnectionStartsTheDaemonAndIsAnswered) {

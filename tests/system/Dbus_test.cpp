@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The daemon on a D-Bus, and without one.
+// Tests the daemon with and without D-Bus.
 #include <cctype>
 #include <cerrno>
 #include <filesystem>
@@ -42,12 +42,12 @@ class DbusTest : public DaemonTest {
   }
 
   DbusCaller newCaller() const { return DbusCaller(bus.address(), kNames); }
-  // The session, of long-form audio, created but not started.
+  // Creates the session, of long-form audio, without starting it.
   static void create(DbusCaller& caller) {
     EXPECT_TRUE(caller.ask("CreateReportingSession", "x", kSession).boolean());
     EXPECT_TRUE(caller.ask("SetServiceType", "qx", kLongFormAudio, kSession).boolean());
   }
-  // Comes back when the session is started; the answer is still to come.
+  // Returns when the session is started. The start itself is answered later.
   static void start(DbusCaller& caller) {
     caller.send(caller.newCall("StartReportingSessionForID", "x", kSession));
     EXPECT_THAT(caller.ask("GetAllReporters").int64List(), Not(IsEmpty()));
@@ -92,7 +92,7 @@ TEST_F(DbusTest, EveryRequestMayComeInTheOtherByteOrder) {
   EXPECT_TRUE(done(caller.ask("SetConfiguration", "a{sv}x", body().array(8, name).number64(kSession))));
   EXPECT_EQ(ofSession("GetServiceNameForReporterID").number<std::uint16_t>(), kLongFormAudio);
   EXPECT_EQ(ofSession("ReporterIDValid").signature, "a{sv}");
-  EXPECT_EQ(caller.ask("GetAllReporters").body.size(), 16U);  // a length, padded, and an identifier
+  EXPECT_EQ(caller.ask("GetAllReporters").body.size(), 16U);  // a padded length and an identifier
   caller.send("StartReportingSessionForID", "x", body().number64(kSession));
 
   const auto content = [](std::uint32_t place) {
@@ -212,7 +212,7 @@ TEST_F(DbusTest, OneSessionTooManyIsOverTheLimit) {
   DbusCaller caller = newCaller();
   for (std::int64_t at = 1; at < kMaxSessions; ++at) {
     caller.sendWithoutAnswer(caller.newCall("CreateReportingSession", "x", at));
-    // Not more at once than may be under way.
+    // No more pending requests than the limit.
     if (at % 256 != 0) continue;
     EXPECT_THAT(caller.ask("GetAllReporters").int64List(), SizeIs(static_cast<std::size_t>(at)));
   }
@@ -266,7 +266,7 @@ TEST_F(DbusTest, EveryMethodIsDescribedAndNoneForTheOwnerAlone) {
 TEST_F(DbusTest, TheKillRequestEndsTheDaemonUnanswered) {
   DbusCaller caller = newCaller();
   const DbusReceived answer = caller.ask("KillService");
-  EXPECT_EQ(answer.error, SD_BUS_ERROR_NO_REPLY);  // the bus's own, since the daemon has gone
+  EXPECT_EQ(answer.error, SD_BUS_ERROR_NO_REPLY);  // sent by the bus, because the daemon is gone
   EXPECT_EQ(daemon.process().wait(), 2);
   EXPECT_EQ(logLinesWith("DESTROYING SERVICE"), 1U);
 }
@@ -316,7 +316,7 @@ TEST_F(NoDbusTest, TheLackOfABusIsSaidOnceAndHarmsNothing) {
   EXPECT_EQ(logLinesWith("D-Bus", " info "), 1U);
 }
 
-// The files that are installed for buses.
+// Paths of the files that are installed for buses.
 
 std::string packaged(const std::string& name) { return std::string(TONEWERK_DBUS_FILES) + "/" + name; }
 
@@ -328,7 +328,7 @@ std::string replaced(std::string text, const std::string& what, const std::strin
 
 class DbusActivationTest : public DaemonTest {};
 
-// The bus starts it at the first call; what it gives it is its environment.
+// The bus starts the daemon at the first call and passes it an environment.
 TEST_F(DbusActivationTest, ABusStartsTheDaemonWhichOpensItsSocketToo) {
   const TemporaryDirectory services;
   const std::string file = replaced(textOfFile(packaged("session/com.orvane.tonewerk.reporting.service")),
@@ -365,8 +365,8 @@ TEST(DbusFilesTest, TheSystemsBusStartsTheUnitAndNothingElse) {
   EXPECT_THAT(file, HasSubstr("\nSystemdService=twreportingd.service\n"));
 }
 
-// A bus that, like a system's, allows nothing by itself, with the policy that is installed. This process's
-// own user stands in for the user `tonewerk`, which need not exist here.
+// Runs a bus that allows nothing by default, as a system bus does, with the installed policy. The user of
+// this process takes the place of the user `tonewerk`, which need not exist here.
 class DbusPolicyTest : public ::testing::Test {
  protected:
   static std::string elements(const std::string& directory, const std::string& user) {
@@ -398,7 +398,7 @@ TEST_F(DbusPolicyTest, TheServicesUserMayHaveTheNameAndCallIt) {
     sd_bus_process(caller.bus(), nullptr);
     return !caller.received().empty();
   }));
-  // It came through: the owner here knows no such object.
+  // The call arrived: this test's owner of the name has no such object.
   EXPECT_EQ(caller.received().at(0).error, SD_BUS_ERROR_UNKNOWN_OBJECT);
 }
 

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What the daemon of an internal build leaves on the disk when a recording shows it signs of trouble.
+// Tests what the daemon of an internal build writes to the disk when a recording contains symptoms of
+// problems.
 #include <chrono>
 #include <filesystem>
 #include <functional>
@@ -41,7 +42,7 @@ class DiagnosticsTest : public DaemonTest {
                       {"STATE_DIRECTORY", daemon.path(DaemonProcess::kState)},
                       {"CONFIGURATION_DIRECTORY", daemon.path(DaemonProcess::kConfiguration)}}});
   }
-  // The whole example at once: what goes by the daemon's clock does not come about.
+  // Replays the whole example at once, so nothing that depends on the daemon's clock happens.
   bool replay() const {
     return twctl({"replay", "--speed", "max", TONEWERK_EXAMPLES_DIRECTORY "/diagnostics.jsonl"}).has_value();
   }
@@ -58,11 +59,11 @@ class DiagnosticsTest : public DaemonTest {
   bool waitForOneOf(const std::string& command) const {
     return waitUntil([&] { return listed(command).size() == 1; });
   }
-  // Lines of one message, too.
+  // Waits for text in the log; it may span the lines of one message.
   bool waitForLog(const std::string& text) const {
     return waitUntil([&] { return daemon.log().find(text) != std::string::npos; });
   }
-  // A file of the item that a command shows as its latest.
+  // Contents of a file of the latest item that a command shows.
   std::string latest(const std::string& command, const std::string& file) const {
     const json shown =
         json::parse(twctl({command, "show", "--latest", "--json"}).value_or(""), nullptr, false);
@@ -80,7 +81,7 @@ TEST_F(DiagnosticsTest, TheExampleProvokesADraftAStallTraceAndAMemoryLog) {
   ASSERT_TRUE(replay());
 
   ASSERT_TRUE(waitForOneOf("drafts")) << daemon.log();
-  // The session got its service type after it was made, and so has no process.
+  // The session got its service type after it was created, so its process is not known.
   EXPECT_THAT(latest("drafts", "draft.md"),
               AllOf(StartsWith("# Invalid x/y coordinates during a Vidro call (IDR)\n"),
                     HasSubstr("- **Process:** not known\n"), HasSubstr("- `processes.txt` (")));
@@ -104,18 +105,18 @@ TEST_F(DiagnosticsTest, TheExampleProvokesADraftAStallTraceAndAMemoryLog) {
   EXPECT_TRUE(waitForLog("WIRED LOG BLOCK 1\nwiredlog: 1 phys_footprint 2\n"));
   EXPECT_THAT(daemon.log(), Not(HasSubstr("\nleft out")));
 
-  // Their symptoms did not last.
+  // The symptoms did not last long enough.
   EXPECT_THAT(listed("captures"), IsEmpty());
 }
 
-// Sources of captures, by the daemon's own clock: it takes 77 seconds.
+// Tests sources of captures with the daemon's own clock: it takes 77 seconds.
 class CaptureSourcesTest : public DiagnosticsTest {
  protected:
   static constexpr ReporterID kHeard = 1;
   static constexpr ReporterID kUnheard = 2;
   static constexpr ReporterID kMusic = 3;
 
-  // Each differs from the one before.
+  // Each message differs from the one before it.
   void soundQuietly(DaemonClient& client, ReporterID alarm) {
     client.send({{"issue_type", "LowRMS"}, {"n", ++sent}}, kCategoryError, kTypeIssueDetector, {alarm});
   }
@@ -160,7 +161,7 @@ TEST_F(CaptureSourcesTest, OfSeveralSourcesOneIsCancelledAndTheOthersAreCaptured
   ASSERT_TRUE(keepOnUntil(kAccepted, [&] { soundQuietly(alarms, kHeard); })) << daemon.log();
   alarms.stop(kHeard);
   ASSERT_TRUE(waitForLogLine("capture cancelled. sessionId="));
-  // A cancelled one keeps nobody from being captured.
+  // A cancelled capture does not prevent the capture of other sources.
   soundQuietly(alarms, kUnheard);
   ASSERT_TRUE(waitUntil([&] { return logLinesWith(kAccepted) == 2; })) << daemon.log();
   ASSERT_TRUE(keepOnUntil("Started Capsa session for haptics leaks.", [&] { leakHaptics(player); }));

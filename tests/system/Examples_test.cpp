@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The example programs, compiled as strangers compile them, and what becomes of what they say.
+// Tests the example programs, compiled as users compile them, and the reports of their messages.
 #include <filesystem>
 #include <map>
 #include <string>
@@ -15,7 +15,7 @@ namespace {
 using nlohmann::json;
 using ::testing::HasSubstr;
 
-// With twctl where a user has it, and the daemon's store where that looks.
+// Runs an example with twctl in PATH and with the daemon's store where twctl looks for it.
 std::optional<std::string> outputOfExample(const char* program, const DaemonProcess& daemon) {
   std::map<std::string, std::string> environment = daemon.clientEnvironment();
   environment["STATE_DIRECTORY"] = daemon.path(DaemonProcess::kState);
@@ -66,7 +66,7 @@ TEST_P(ExamplesTest, PrintsTheVolumeSummaryThatCameOfIt) {
   EXPECT_THAT(*output, HasSubstr("\"QMSessionVolume\":0.5"));
 }
 
-// It asks for the answer to its start, destroys the session, flushes, and destroys the client.
+// The example asks for the answer to its start, destroys the session, flushes, and destroys the client.
 TEST(ExampleInCxxTest, IsToldThatItsSessionHasStopped) {
   DaemonProcess daemon;
   ASSERT_TRUE(daemon.start());

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Several clients at once that send whatever chance makes of valid and invalid frames, and one that works.
+// Tests several clients that send random valid and invalid frames, together with one that works normally.
 #include <array>
 #include <atomic>
 #include <random>
@@ -22,7 +22,7 @@ using ::testing::SizeIs;
 
 constexpr ReporterID kSession = 1'000'000;
 
-// Frames by chance: one seed makes the same ones each time.
+// Makes random frames; the same seed always makes the same frames.
 class RandomFrames {
  public:
   explicit RandomFrames(unsigned seed) : random_(seed) {}
@@ -32,7 +32,7 @@ class RandomFrames {
   }
   bool isOneOutOf(std::size_t count) { return below(count) == 0; }
 
-  // Mostly a request or notification with arguments that suit, now and then something else.
+  // Usually a request or notification with suitable arguments, sometimes something else.
   std::string next() {
     const Method& method = anyMethod();
     std::vector<std::string> params;
@@ -49,7 +49,7 @@ class RandomFrames {
   }
 
  private:
-  // All but the one that ends the daemon.
+  // All methods except the one that ends the daemon.
   const Method& anyMethod() {
     const std::vector<Method>& methods = requests::all().methods;
     for (;;) {
@@ -72,7 +72,7 @@ class RandomFrames {
       case ParameterType::kMap:
         return message();
       case ParameterType::kInt64ListOrNone:
-        // Never without identifiers: that would reach the well-behaved client's session, too.
+        // Never without identifiers, because that would also reach the normal client's session.
         return packed::array({reporterID(), reporterID()});
     }
     return packed::nil();
@@ -114,7 +114,7 @@ class RandomFrames {
     }
   }
 
-  // A value, or something that is none.
+  // A value, or something that the protocol does not carry.
   std::string anything(std::size_t depth) {
     switch (below(6)) {
       case 0:
@@ -141,7 +141,7 @@ class HostileClientsTest : public DaemonTest {
   static constexpr unsigned kClients = 4;
   static constexpr int kFramesEach = 3000;
 
-  // Sends its frames over as many connections as that takes, reading some answers and not others.
+  // Sends its frames, over as many connections as necessary, and reads only some of the answers.
   void attack(unsigned seed) {
     RandomFrames frames(seed);
     auto client = std::make_unique<RawClient>(daemon.socketPath());
@@ -151,8 +151,8 @@ class HostileClientsTest : public DaemonTest {
     }
   }
 
-  // False when the connection is of no more use. Takes in what the daemon sends, so that it never waits for
-  // us.
+  // False when the connection can no longer be used. Reads what the daemon sends, so that the daemon never
+  // waits for this client.
   static bool sendPatiently(RawClient& client, std::string_view bytes) {
     while (!bytes.empty()) {
       pollfd polled{client.fileDescriptor(), POLLIN | POLLOUT, 0};
@@ -205,7 +205,7 @@ TEST_F(HostileClientsTest, AWellBehavedClientGetsItsResultsThroughout) {
   const RecordedEvents events(daemon.storePath());
   EXPECT_EQ(events.integrity(), "ok");
   auto recorded = events.named("com.orvane.longformaudio.HearingHealth.AudioExposure");
-  // A damaged message may be one for everybody's sessions.
+  // A damaged message may have been sent to all sessions.
   std::erase_if(recorded, [](const auto& event) { return !event.contains("round"); });
   ASSERT_THAT(recorded, SizeIs(rounds));
   for (std::size_t at = 0; at < rounds; ++at) EXPECT_EQ(recorded[at].at("round"), at);

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Drafts of bug reports, over restarts of the daemon.
+// Tests drafts of bug reports across restarts of the daemon.
 #include <chrono>
 #include <filesystem>
 #include <string>
@@ -19,7 +19,7 @@ class IssueDraftsSystemTest : public DaemonTest {
     daemon.setEnvironment("TONEWERK_LOG", "debug");
   }
 
-  // A run of the daemon in which a call reports invalid coordinates.
+  // Runs the daemon once; a call reports invalid coordinates.
   void reportOnce() {
     ASSERT_TRUE(daemon.start());
     {

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Bytes that are no frame of the protocol: they end the connection that sent them, and nobody else notices.
+// Tests bytes that are not a frame of the protocol: they end their connection, and no other client notices.
 #include <signal.h>
 #include <string>
 #include <unistd.h>
@@ -94,7 +94,7 @@ std::vector<Bytes> malformedFrames() {
   };
 }
 
-// Frames whose headers claim more than ever comes.
+// Frames whose headers announce more data than follows.
 std::vector<Bytes> emptyClaims() {
   constexpr std::uint32_t kMax = 0xFFFFFFFF;
   const std::string start = arrayHeader(4) + integer(0) + integer(1);
@@ -188,7 +188,7 @@ TEST_F(MalformedFramesTest, WhatCameBeforeABadFrameIsStillCarriedOut) {
   client.send(request(1, "createReportingSession", {integer(5)}) +
               packed::notification("setServiceType", {integer(3), integer(5)}) + byte(0xC1));
   EXPECT_TRUE(client.waitForEnd());
-  // Its session goes with the connection, once both have been made.
+  // The session is destroyed with its connection, after both requests have run.
   EXPECT_TRUE(waitUntil([&] { return bystander->allReporters() == std::vector{kBystander}; }));
 }
 
@@ -227,7 +227,7 @@ TEST_F(MalformedFramesTest, ClaimsOfGigabytesCostNothingWhileTheBytesDoNotCome) 
     }
   }
   expectNobodyElseNoticed();
-  // Half a mebibyte each is what 64 connections may well need under a sanitizer.
+  // Under a sanitizer each of the 64 connections may need half a mebibyte.
   EXPECT_LT(daemon.residentBytes(), before + clients.size() * 512 * 1024);
   for (const auto& client : clients) {
     client->shutDown(SHUT_WR);
@@ -257,7 +257,7 @@ TEST_F(MalformedFramesTest, AClientKilledInAFrameLeavesItsSessionsToBeStopped) {
   ASSERT_GT(child, 0);
   const std::string whole = messageOfSize(kMaxFrameBytes);
   client->send(std::string_view(whole).substr(0, whole.size() / 2));
-  client = nullptr;  // now the child alone holds the connection
+  client = nullptr;  // now only the child holds the connection
   EXPECT_THAT(bystander->allReporters(), ::testing::SizeIs(2));
   ::kill(child, SIGKILL);
   EXPECT_TRUE(waitUntil([&] { return bystander->allReporters() == std::vector{kBystander}; }));

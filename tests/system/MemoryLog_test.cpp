@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What a message makes of the memory tools, as processes.
+// Tests that a message starts the memory tools as processes.
 #include <chrono>
 #include <string>
 
@@ -16,7 +16,7 @@ constexpr AudioEventType kMemoryLog = 19;
 
 class MemoryLogSystemTest : public DaemonTest {
  protected:
-  // A client of a daemon with these tools, none for the daemon's own, that sends the message.
+  // Starts a daemon with these tools (its own when empty), and sends the message from a client.
   void requestMemoryLog(const std::string& tools) {
     if (!tools.empty()) {
       ASSERT_TRUE(daemon.writeConfiguration("preferences/com.orvane.tonewerk.twreporting.toml",
@@ -51,7 +51,7 @@ TEST_F(MemoryLogSystemTest, ToolsThatAreNotThereOrWriteWithoutEndAreSaid) {
   requestMemoryLog(R"(["/nowhere/tool", "yes 0123456789012345678901234567890123456789"])");
   EXPECT_EQ(logLinesWith("wiredlog: unable to execute '/nowhere/tool'"), 1U);
   EXPECT_EQ(logLinesWith("was stopped after 4194304 bytes"), 1U);
-  // 13 lines of 41 bytes a block, and a last one of 127 bytes.
+  // 13 lines of 41 bytes in each block, and a last block of 127 bytes.
   EXPECT_EQ(logLinesWith("WIRED LOG BLOCK 7870"), 1U);
   EXPECT_EQ(logLinesWith("WIRED LOG BLOCK 7871"), 0U);
 }

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Real playback through a real PipeWire, the bridge and the daemon, to the daemon's store and files.
+// Tests real playback through PipeWire, the bridge and the daemon, up to the daemon's store and files.
 #include <algorithm>
 #include <chrono>
 #include <filesystem>
@@ -24,7 +24,7 @@ using ::testing::EndsWith;
 using ::testing::SizeIs;
 using ::testing::StartsWith;
 
-// The payloads of all recorded events of this name, oldest first. None when there is no readable store.
+// The payloads of all recorded events of this name, oldest first. Empty without a readable store.
 std::vector<nlohmann::json> eventsOf(const std::string& storePath, const std::string& name) {
   std::vector<nlohmann::json> events;
   sqlite3* database = nullptr;
@@ -68,7 +68,7 @@ class PipeWireBridgeTest : public ::testing::Test {
 
   std::string path(const std::string& name) const { return directory.path(name); }
 
-  // Until the bridge has said this so many times.
+  // Waits until the bridge has written this text at least `times` times.
   bool waitForBridge(const std::string& text, int times) {
     return waitUntil([&] {
       const std::string said = textOfFile(path("bridge"));
@@ -78,7 +78,7 @@ class PipeWireBridgeTest : public ::testing::Test {
     });
   }
 
-  // Plays until told otherwise; the stream's node, 0 when it does not run.
+  // Plays until stopPlaying(). Returns the stream's node, or 0 when it does not run.
   std::uint32_t play() {
     EXPECT_TRUE(
         player.start({kPlayer, {graph.makeTone(60)}, graph.environment()}, path("player"), path("player")));
@@ -95,7 +95,7 @@ class PipeWireBridgeTest : public ::testing::Test {
   std::string channelFile() const {
     return daemon.path(DaemonProcess::kRuntime, "channels/tw-pipewire-" + std::to_string(getuid()) + ".json");
   }
-  // What the bridge has published of the speaker; an empty object when it has not.
+  // The channel that the bridge has published for the speaker; an empty object without one.
   nlohmann::json channelOfSpeaker(const std::string& name) const {
     const nlohmann::json content = nlohmann::json::parse(textOfFile(channelFile()), nullptr, false);
     if (!content.is_object()) return nlohmann::json::object();
@@ -207,7 +207,7 @@ TEST_F(PipeWireBridgeTest, PublishesWhatTheGraphsDriversDo) {
   EXPECT_FALSE(std::filesystem::exists(channelFile()));
 }
 
-// The daemon's first session: what it subscribes to has to be there already.
+// This is the daemon's first session, so the channels that it subscribes to must already exist.
 TEST_F(PipeWireBridgeTest, HasTheDaemonReportWhatTheDriversDidDuringASession) {
   play();
   ASSERT_TRUE(waitUntil([&] { return counted("Cycles") > 20; }));
@@ -232,7 +232,7 @@ TEST_F(PipeWireBridgeTest, HasTheDaemonReportWhatTheDriversDidDuringASession) {
 TEST_F(PipeWireBridgeTest, ReportsOverloadsOfAStreamThatHangs) {
   play();
   ASSERT_TRUE(waitUntil([&] { return counted("Cycles") > 20; }));
-  // Its driver goes on without it.
+  // The driver continues without the stopped player.
   player.signal(SIGSTOP);
   const std::int64_t before = counted("Incomplete Cycles");
   ASSERT_TRUE(waitUntil([&] { return counted("Incomplete Cycles") > before; }));

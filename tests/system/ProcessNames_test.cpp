@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What a client's process calls itself, in everything that names it.
+// Tests the name of a client's process in all places that show it.
 #include <filesystem>
 #include <nlohmann/json.hpp>
 #include <string>
@@ -24,11 +24,11 @@ constexpr ReporterID kSession = 77;
 constexpr const char* kSummary = "com.orvane.unknown.Session_Generic.Summary";
 constexpr const char* kUptime = "com.orvane.tonewerk.twreportingclientuptime";
 
-// Fifteen bytes are what the kernel keeps: all but the second half of the last character.
+// The kernel keeps fifteen bytes: all but the second half of the last character.
 constexpr const char* kName = "lecteur-musiqu\u00E9";
 constexpr const char* kNameAsText = "lecteur-musiqu\uFFFD";
 
-// Gives this process, of which it is the first thread, another name for a while.
+// Changes the name of this process while the object exists. Runs on the first thread of the process.
 class ProcessName {
  public:
   explicit ProcessName(const char* name) {
@@ -43,7 +43,7 @@ class ProcessName {
   char before_[16] = {};
 };
 
-// On internal builds, where every session has its summary file, and with an endpoint in the network.
+// Runs an internal build, where every session has its summary file, with an endpoint in the network.
 class ProcessNamesTest : public DaemonTest {
  protected:
   void SetUp() override {
@@ -59,7 +59,7 @@ class ProcessNamesTest : public DaemonTest {
     return events;
   }
 
-  // The one summary file, once it is complete.
+  // The only summary file, once it is complete.
   json summaryFile() const {
     json file;
     EXPECT_TRUE(waitUntil([&] {
@@ -96,7 +96,7 @@ TEST_F(ProcessNamesTest, ANameThatIsCutInACharacterIsTextInEverythingThatComesOf
   ASSERT_THAT(summaries, SizeIs(1));
   ASSERT_TRUE(summaries[0].is_object());
   EXPECT_EQ(summaries[0].at("clientProcessName"), kNameAsText);
-  // Of several: twctl is a client, too.
+  // One of several events, because twctl is a client too.
   EXPECT_TRUE(waitUntil([&] {
     for (const json& event : waitForEvent(kUptime)) {
       if (event.is_object() && event.at("processName") == kNameAsText) return true;
@@ -106,7 +106,7 @@ TEST_F(ProcessNamesTest, ANameThatIsCutInACharacterIsTextInEverythingThatComesOf
   EXPECT_EQ(summaryFile().back().at("Session_Generic_Summary_1").at("clientProcessName"), kNameAsText);
 }
 
-// Which take nothing but UTF-8, and would refuse the whole batch for one name.
+// Endpoints accept only UTF-8, and would refuse a whole batch because of one name.
 TEST_F(ProcessNamesTest, ANameThatIsCutInACharacterIsTextInWhatAnEndpointGets) {
   const ProcessName name(kName);
   {
@@ -116,7 +116,7 @@ TEST_F(ProcessNamesTest, ANameThatIsCutInACharacterIsTextInWhatAnEndpointGets) {
     client.send({{"a", 1}}, 4, kTypeStart, {kSession});
     client.stop(kSession);
   }
-  EXPECT_EQ(daemon.stop(), 0);  // with everything sent
+  EXPECT_EQ(daemon.stop(), 0);  // after everything was sent
   ASSERT_THAT(receiver.requests(), Not(IsEmpty()));
   ASSERT_THAT(receiver.problems(), IsEmpty());
   std::vector<json> attributes;

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Signals that ask the daemon for something, and preference files that are written while it runs.
+// Tests signals to the daemon, and preference files that are written while it runs.
 #include <algorithm>
 #include <filesystem>
 #include <signal.h>
@@ -30,7 +30,7 @@ class ReloadTest : public DaemonTest {
     ASSERT_TRUE(daemon.start());
     ASSERT_THAT(manager.waitForLine("READY=1"), Not(IsEmpty()));
   }
-  // Comes back when the daemon has said that it is done.
+  // Returns when the daemon has reported that the reload is done.
   void reload() {
     daemon.process().signal(SIGHUP);
     EXPECT_THAT(manager.waitForLine("RELOADING=1"), HasSubstr("MONOTONIC_USEC="));
@@ -62,7 +62,7 @@ TEST_F(ReloadTest, ConsumersAreReadAgainAtOnce) {
   ASSERT_TRUE(waitUntil([&] { return recorded() == 1; }));
   ASSERT_TRUE(daemon.writeConfiguration("preferences/com.orvane.metricon.toml", "consumers = []\n"));
   reload();
-  report(client, 2);  // nobody asks for it any more
+  report(client, 2);  // no consumer asks for it any more
   ASSERT_TRUE(daemon.writeConfiguration("preferences/com.orvane.metricon.toml", ""));
   reload();
   report(client, 3);
@@ -86,7 +86,7 @@ TEST_F(ReloadTest, BackendsAreThoseOfTheTimeAtWhichASessionStarted) {
   client.start(kSession + 1);
   ASSERT_TRUE(waitForLogLine("no backends found, this session won't get sent to the server"));
   client.send({{"number", 1}}, 4, kTypeStart, {kSession, kSession + 1});
-  EXPECT_EQ(daemon.stop(), 0);  // with everything written
+  EXPECT_EQ(daemon.stop(), 0);  // after everything was written
 
   const auto sessions = recorded.rtcSessions();
   ASSERT_EQ(sessions.size(), 1U);
@@ -126,7 +126,7 @@ TEST_F(ReloadTest, AnInternalBuildStaysWhatItWasAndOtherFactsAreReadAgain) {
   ASSERT_TRUE(daemon.writeConfiguration("device-facts.toml", "InternalBuild = true\n"));
   reload();
 
-  // Nothing of an internal build: no file of the session's messages.
+  // It is no longer an internal build, so no file of the session's messages is written.
   DaemonClient client = connect();
   client.create(kSession, kLongFormAudio);
   client.start(kSession);
@@ -175,7 +175,7 @@ TEST_F(ReloadTest, APreferenceFileThatDoesNotParseIsSaidWhenItIsWritten) {
   start();
   ASSERT_TRUE(daemon.writeConfiguration("preferences/com.orvane.unheard.of.toml", "fine = 1\n= 5\n"));
   EXPECT_TRUE(waitForLogLine("com.orvane.unheard.of.toml:2:"));
-  // Below the state directory, too, which gets its preferences only now.
+  // Also below the state directory, where the preferences are created only now.
   const std::string written = daemon.path(DaemonProcess::kState, "preferences");
   fs::create_directory(written);
   ASSERT_TRUE(

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What becomes of what clients say: events in the store, and summary files.
+// Tests the reports of clients' messages: events in the store, and summary files.
 #include <algorithm>
 #include <chrono>
 #include <cmath>
@@ -43,7 +43,7 @@ class ReportsTest : public RunningDaemonTest {
     return waitUntil([&] { return recorded().named(name).size() >= count; });
   }
 
-  // The paths of what lies where summary files do, sorted.
+  // The paths of everything in the directory of the summary files, sorted.
   std::vector<std::filesystem::path> filesInReporting() const {
     std::vector<std::filesystem::path> found;
     std::error_code error;
@@ -55,7 +55,7 @@ class ReportsTest : public RunningDaemonTest {
     std::sort(found.begin(), found.end());
     return found;
   }
-  // Those of all summary files.
+  // The paths of all summary files.
   std::vector<std::filesystem::path> summaryFiles() const {
     std::vector<std::filesystem::path> found = filesInReporting();
     std::erase_if(found, [](const auto& path) { return path.extension() != ".json"; });
@@ -71,7 +71,7 @@ class ReportsTest : public RunningDaemonTest {
     return json::parse(stream, nullptr, false);
   }
 
-  // Waits for the one file there is to be. It is whole when it is there.
+  // Waits for the only summary file. It is complete as soon as it exists.
   json summaryFile() const {
     json file;
     EXPECT_TRUE(waitUntil([&] {
@@ -83,7 +83,7 @@ class ReportsTest : public RunningDaemonTest {
     return file;
   }
 
-  // A minute of playback that ended just now: ten seconds quiet, twenty loud.
+  // Sends a minute of playback that ended just now: ten seconds quiet, twenty loud.
   void play(DaemonClient& client, ReporterID reporterID) {
     const double begin = now() - 60.0;
     const auto say = [&](AudioEventType type, double at, ValueMap message) {
@@ -162,7 +162,7 @@ TEST_F(ReportsTest, ASessionsEndIsSummedUp) {
   client.create(kSession, kLongFormAudio);
   client.start(kSession);
   client.send({{"a", 1}}, kPlayback, kTypeStart, {kSession});
-  client.send({{"a", 1}}, kPlayback, kTypeStart, {kSession});  // says nothing new
+  client.send({{"a", 1}}, kPlayback, kTypeStart, {kSession});  // repeats the message before it
   client.send({{"session_duration", 12.5}}, kPlayback, kTypeStop, {kSession});
   client.send({{"issue_type", "overload"}}, 1, kTypeGeneric, {kSession});
   client.stop(kSession);
@@ -174,7 +174,7 @@ TEST_F(ReportsTest, ASessionsEndIsSummedUp) {
   EXPECT_EQ(summary.at("overload_count"), 1);
   EXPECT_EQ(summary.at("num_messages"), 4);
   EXPECT_EQ(summary.at("num_unique_messages"),
-            5);  // with the start and the stop, without what was said twice
+            5);  // with the start and the stop, without the repeated one
   EXPECT_EQ(summary.at("singleMessageSession"), false);
   EXPECT_EQ(summary.at("summaryServiceName"), "longformaudio");
 }
@@ -276,9 +276,9 @@ TEST_F(ReportsTest, ASummaryFileIsWrittenForATestSessionAlone) {
   EXPECT_THAT(summaryFiles().front().string(), EndsWith("-5-Unknown-test.json"));
 }
 
-// Stops within one second once wrote one file, the last one's.
+// Several stops within one second once left only the file of the last one.
 TEST_F(ReportsTest, StopsWithinOneSecondLeaveAWholeFileEach) {
-  constexpr int kRuns = 20;  // far fewer seconds
+  constexpr int kRuns = 20;  // in far fewer seconds
   DaemonClient client = connect();
   client.create(5, 11);
   for (int run = 0; run < kRuns; ++run) {
@@ -324,7 +324,7 @@ TEST_F(ReportsTest, AnEntryThatJsonCannotSayLeavesTheFileValid) {
   EXPECT_TRUE(waitForLogLine("dataWithJSONObject: "));
 }
 
-// Half a file under its final name was once what such a death left.
+// Such a death once left half a file under its final name.
 TEST_F(ReportsTest, ADaemonThatIsKilledWhileItWritesAFileLeavesNoHalfOne) {
   DaemonClient client = connect();
   client.create(5, 11);

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The requests end to end: what is answered, how often, in which order.
+// Tests the requests end to end: which answers come, how often, in which order.
 #include <string>
 #include <vector>
 
@@ -24,7 +24,7 @@ const std::string kStop = "stopReportingSessionForID";
 
 class RequestsTest : public RunningDaemonTest {
  protected:
-  // The identifiers of the answers up to that to the request `last`.
+  // The identifiers of the answers, up to the answer to request `last`.
   static std::vector<std::uint32_t> answersUpTo(RawClient& client, std::uint32_t last) {
     std::vector<std::uint32_t> identifiers;
     while (identifiers.empty() || identifiers.back() != last) {
@@ -133,7 +133,7 @@ TEST_F(RequestsTest, ASessionIsSeenByAllClientsAndChangedByItsOwn) {
   other.stop(kSession);
   EXPECT_EQ(owner.serviceType(kSession), kLongFormAudio);
 
-  // The same identifier in two hands is two sessions; the older connection's is found first.
+  // The same identifier on two connections means two sessions; that of the older connection is found first.
   other.create(kSession, 3);
   EXPECT_EQ(other.serviceType(kSession), 3);
   DaemonClient third = connect();
@@ -147,7 +147,7 @@ TEST_F(RequestsTest, AnotherServiceTypeMakesAnotherSessionThatIsNotStarted) {
       request(3, "setServiceType", {integer(3), integer(kSession)}) + request(4, kStop, {integer(kSession)}) +
       request(5, kStart, {integer(kSession)}) +
       request(6, "setServiceType", {integer(3), integer(kSession)}) + request(7, kStop, {integer(kSession)}));
-  // The first start's session is gone; the same type again changes nothing.
+  // The session of the first start is gone. Setting the same type again changes nothing.
   EXPECT_THAT(answersUpTo(client, 7), ElementsAre(1, 3, 4, 6, 5, 7));
 }
 

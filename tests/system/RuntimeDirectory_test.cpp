@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A runtime directory that goes and comes while the daemon runs.
+// Tests a runtime directory that is removed and made again while the daemon runs.
 #include <csignal>
 #include <cstdlib>
 #include <filesystem>
@@ -20,7 +20,7 @@ constexpr AudioServiceType kLongFormAudio = 7;
 
 class RuntimeDirectoryTest : public RunningDaemonTest {
  protected:
-  // The daemon may just be making what is in it, as it does when it starts.
+  // Tries again, because the daemon may be creating files in it, as it does at its start.
   void remove() const {
     ASSERT_TRUE(waitUntil([&] {
       std::error_code error;
@@ -88,7 +88,8 @@ TEST_F(RuntimeDirectoryTest, AnotherDaemonsSocketInItIsLeftAlone) {
   ASSERT_TRUE(process.start(command, other.path(DaemonProcess::kState, "output"),
                             other.path(DaemonProcess::kState, "log")));
   ASSERT_TRUE(waitUntil([&] { return other.accepts(); }));
-  // The other's directory takes the place of ours, as when somebody starts another daemon after a clean-up.
+  // The other daemon's directory takes the place of this one's, as when another daemon is started after a
+  // clean-up.
   fs::rename(other.path(DaemonProcess::kRuntime), runtime);
   EXPECT_TRUE(waitForLogLine("clients cannot connect: " + daemon.socketPath() + " is in use by"))
       << daemon.log();

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The daemon and the service manager that started it.
+// Tests the daemon with the service manager that started it.
 #include <fcntl.h>
 #include <string>
 #include <sys/stat.h>
@@ -64,7 +64,7 @@ TEST_F(ServiceManagerSystemTest, IsPingedWhileTheWorkQueueIsBlocked) {
   client.request("sendMessage", ReportingClient::messageArguments({{"reason", "test"}}, 1, kMemoryLog, {77}));
   ASSERT_TRUE(waitForLogLine("wiredlog: requesting"));
   {
-    // The queue waits for the tool, which waits for somebody to write to it.
+    // The work queue waits for the tool, which waits for data.
     const FileDescriptor tool(::open(gate.c_str(), O_WRONLY | O_CLOEXEC));
     ASSERT_TRUE(tool);
     manager.take();

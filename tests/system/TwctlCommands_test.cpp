@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The command-line tool as a program, beside a running daemon.
+// Tests the command-line tool as a program, with a running daemon.
 #include <filesystem>
 #include <fstream>
 #include <nlohmann/json.hpp>
@@ -31,8 +31,8 @@ constexpr ReporterID kSession = 77;
 
 class TwctlTest : public RunningDaemonTest {
  protected:
-  // Runs it to its end with the daemon's directories; its exit status. What it printed is in output and
-  // errors.
+  // Runs the tool to its end with the daemon's directories and returns its exit status. Fills `output` and
+  // `errors`.
   std::optional<int> run(const std::vector<std::string>& arguments) {
     const TemporaryDirectory directory;
     ChildProcess process;
@@ -52,7 +52,7 @@ class TwctlTest : public RunningDaemonTest {
              {"CONFIGURATION_DIRECTORY", daemon.path(DaemonProcess::kConfiguration)}}};
   }
 
-  // One object a line.
+  // Parses one JSON object per line.
   static std::vector<json> objects(const std::string& text) {
     std::vector<json> found;
     std::istringstream lines(text);
@@ -186,7 +186,7 @@ TEST_F(TwctlTest, AMessageForAnIdentifierThatNobodyHasIsSentToNone) {
   EXPECT_EQ(RecordedEvents(daemon.storePath()).named(sent).at(0).at("n"), 2);
 }
 
-// Each look at the daemon left an event on how long it had taken.
+// Each command that only reads once left an event with the duration of its connection.
 TEST_F(TwctlTest, LookingLeavesNoEventBehindAndSendingDoes) {
   DaemonClient client = connect();
   client.create(kSession, 7);
@@ -195,7 +195,7 @@ TEST_F(TwctlTest, LookingLeavesNoEventBehindAndSendingDoes) {
   EXPECT_EQ(run({"validate", "77"}), kDone);
   EXPECT_EQ(run({"top", "--json", "--interval", "0.05"}), kDone);
   EXPECT_EQ(run({"send", "--category", "Playback", "--type", "Start", "n=1"}), kDone);
-  // Whoever waited for the daemon to listen has left one, too.
+  // The connections that waited for the daemon to listen have left such events too.
   const auto visits = [this] {
     const char* uptime = "com.orvane.tonewerk.twreportingclientuptime";
     std::vector<json> events = RecordedEvents(daemon.storePath()).named(uptime);
@@ -203,7 +203,7 @@ TEST_F(TwctlTest, LookingLeavesNoEventBehindAndSendingDoes) {
     return events;
   };
   ASSERT_TRUE(waitUntil([&] { return !visits().empty(); }));
-  EXPECT_THAT(visits(), SizeIs(1));  // those of earlier connections would come before
+  EXPECT_THAT(visits(), SizeIs(1));  // events of earlier connections would come before it
 }
 
 TEST_F(TwctlTest, TheStoreIsWherePathsSays) {
@@ -246,8 +246,8 @@ TEST_F(TwctlTest, TheExamplesArePlayedAndRecorded) {
   ASSERT_TRUE(waitForEvents(name, 3));
   const std::vector<json> summaries = RecordedEvents(daemon.storePath()).named(name);
   ASSERT_THAT(summaries, SizeIs(3));
-  // Two seconds at 0.5, two at 0.8, one and a half on headphones; played in real time, on a machine that has
-  // other things to do.
+  // Two seconds at 0.5, two at 0.8, one and a half on headphones. Played in real time on a machine that may
+  // be busy.
   const std::vector<double> seconds{2.0, 2.0, 1.5};
   const std::vector<double> volumes{0.5, 0.8, 0.8};
   const std::vector<std::string> devices{"Speaker", "Speaker", "Headphones"};
@@ -365,7 +365,7 @@ TEST_F(TwctlTest, ChannelsAreShownAsTheyAreAndAsTheyChange) {
   ASSERT_TRUE(watcher.start(command({"channels", "--json", "--driver", "Amp", "--watch", "0.05"}),
                             directory.path("output"), directory.path("errors")));
   int value = 1;
-  // The watcher may begin at any of these.
+  // The watcher may start at any of these values.
   EXPECT_TRUE(waitUntil([&] {
     publish(value += 1000);
     const auto seen = objects(textOfFile(directory.path("output")));
@@ -400,7 +400,7 @@ TEST_F(TwctlTest, WhatIsWrittenTakesEffectInTheRunningDaemon) {
       << errors;
   DaemonClient client = connect();
   client.create(kSession, 7);
-  // A change shows within a second or so: from some message on none is recorded.
+  // The change takes effect within about a second: later messages are not recorded.
   const RecordedEvents events(daemon.storePath());
   std::size_t sent = 0;
   EXPECT_TRUE(waitUntil([&] {

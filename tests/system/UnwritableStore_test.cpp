@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A store that cannot be written: the daemon serves on, says so once, and goes on writing when it can.
+// Tests a store that cannot be written: the daemon keeps serving, logs the failure once, and writes again
+// when it can.
 #include <filesystem>
 #include <fstream>
 #include <sqlite3.h>
@@ -61,7 +62,7 @@ TEST_F(UnwritableStoreTest, ADaemonThatNeverGetsToItsStoreServesAndEnds) {
   ASSERT_TRUE(daemon.start());
   DaemonClient client = connect();
   startReporting(client);
-  // Far more than there is room for.
+  // Far more messages than there is room for.
   for (int at = 0; at < 10'000; ++at) {
     client.request("sendMessage",
                    ReportingClient::messageArguments({{"number", at}}, 4, kTypeStart, {kSession}));
@@ -83,7 +84,7 @@ TEST_F(UnwritableStoreTest, SomebodyElsesWriteLockIsWaitedFor) {
   reportOne(client);
   EXPECT_TRUE(waitUntil([&] { return failures() == 1; }));
   reportOne(client);
-  EXPECT_EQ(recorded(), 1U);  // reading goes on
+  EXPECT_EQ(recorded(), 1U);  // reading still works
   sqlite3_close(other);
   EXPECT_TRUE(waitUntil([&] { return recorded() == reported; }));
   EXPECT_TRUE(waitUntil([&] { return resumptions() == 1; }));

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Watching a running daemon: the requests for it, and twctl top and tail as programs.
+// Tests watching a running daemon: its requests, and twctl top and tail as programs.
 #include <csignal>
 #include <cstdio>
 #include <fcntl.h>
@@ -37,13 +37,13 @@ const Arguments kNoFilter{std::nullopt, std::nullopt, std::nullopt};
 class WatchingTest : public DaemonTest {
  protected:
   void SetUp() override {
-    daemon.setEnvironment("TONEWERK_LOG", "info");  // says who watches
-    // Without this a sanitizer holds more memory back than the daemon may use.
+    daemon.setEnvironment("TONEWERK_LOG", "info");  // logs who watches
+    // Without this a sanitizer keeps more memory than the daemon may use.
     daemon.setEnvironment("ASAN_OPTIONS", "quarantine_size_mb=8");
     ASSERT_TRUE(daemon.start());
   }
 
-  // A client with a started session.
+  // Returns a client with a started session.
   DaemonClient player() {
     DaemonClient client = connect();
     client.create(kSession, kTelephony);
@@ -93,7 +93,7 @@ class WatchingTest : public DaemonTest {
   ChildProcess tool;
 };
 
-// The requests.
+// Tests of the requests.
 
 TEST_F(WatchingTest, AWatcherThatDoesNotAskMissesTheOldestAndHoldsNoMoreThanItsBound) {
   DaemonClient client = player();
@@ -138,7 +138,7 @@ TEST_F(WatchingTest, TheLargestAndTheDeepestMessageThatAnAnswerHoldsArrive) {
   DaemonClient client = player();
   DaemonClient watcher = connect();
   open(watcher);
-  // Leaves room for what the session adds.
+  // Leaves room for the keys that the session adds.
   client.send({{"number", 1}, {"text", std::string(TapSubscriber::kMaxAnswerBytes - 2000, 'x')}}, kPlayback,
               kTypeStart, {kSession});
   EXPECT_THAT(numbersIn(nextAnswer(watcher)), ElementsAre(1));
@@ -178,7 +178,7 @@ TEST_F(WatchingTest, AnotherUserIsRefused) {
   std::filesystem::permissions(socket, perms::all);
   runAsOtherUser([&] {
     DaemonClient stranger = connect();
-    stranger.create(78);  // which everybody may
+    stranger.create(78);  // every client may do this
     const std::map<std::string, Arguments> requests{
         {"watch.sessions", {0}}, {"watch.openMessages", kNoFilter}, {"watch.nextMessages", {}}};
     for (const auto& [method, arguments] : requests) {
@@ -190,7 +190,7 @@ TEST_F(WatchingTest, AnotherUserIsRefused) {
   EXPECT_EQ(logLinesWith("watches messages"), 0U);
 }
 
-// twctl top.
+// Tests of twctl top.
 
 TEST_F(WatchingTest, TopPrintsOneFrameIntoAFile) {
   DaemonClient client = player();
@@ -213,7 +213,7 @@ TEST_F(WatchingTest, TopPrintsOneFrameIntoAFile) {
   EXPECT_GE(object["seconds"], 0.0);
 }
 
-// twctl top on a terminal.
+// Tests of twctl top on a terminal.
 class TopOnATerminalTest : public WatchingTest {
  protected:
   void SetUp() override {
@@ -273,7 +273,7 @@ TEST_F(TopOnATerminalTest, FitsTheWindow) {
   startTop();
   ASSERT_TRUE(terminal.waitFor("... and 3 more"));
   terminal.resize(80, 6);
-  tool.signal(SIGWINCH);  // as the system does for a terminal's own processes
+  tool.signal(SIGWINCH);  // the system sends it to a terminal's own processes
   EXPECT_TRUE(terminal.waitFor("... and 2 more"));
   terminal.press("q");
   EXPECT_EQ(tool.wait(), 0);
@@ -287,7 +287,7 @@ TEST_F(TopOnATerminalTest, RestoresTheTerminalBeforeItSaysThatTheDaemonHasGone) 
   EXPECT_THAT(errors(), HasSubstr("twctl: the daemon has gone"));
 }
 
-// twctl tail.
+// Tests of twctl tail.
 
 TEST_F(WatchingTest, TailShowsWhatItsFilterWantsAsItArrives) {
   DaemonClient client = player();

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Well-formed requests with arguments that do not suit: refused with words that name the argument, without
-// changing anything and without ending the connection.
+// Tests well-formed requests with unsuitable arguments. They are refused with a text that names the argument,
+// change nothing, and do not end the connection.
 #include <map>
 #include <string>
 #include <vector>
@@ -138,7 +138,7 @@ class WrongArgumentsTest : public RunningDaemonTest {
     EXPECT_EQ(bystander->serviceType(kSession), 7);
   }
 
-  // Sends the request, then another that is right: both have to be answered, in this order.
+  // Sends the request, then a correct one. Both must be answered, in this order.
   void expectRefused(std::string_view method, const std::vector<std::string>& params, std::int64_t code,
                      const std::string& named) {
     const std::uint32_t identifier = nextIdentifier;
@@ -198,7 +198,7 @@ TEST_F(WrongArgumentsTest, TooFewAndTooManyArgumentsAreRefused) {
 }
 
 TEST_F(WrongArgumentsTest, AVastNumberOfArgumentsIsRefusedAtTheCostOfAFew) {
-  const std::string params(900'000, static_cast<char>(0xC0));  // nil, each a byte
+  const std::string params(900'000, static_cast<char>(0xC0));  // nils of one byte each
   ASSERT_TRUE(raw->send(packed::arrayHeader(4) + integer(0) + integer(1) + text("getAllReporters") +
                         packed::arrayHeader(static_cast<std::uint32_t>(params.size())) + params));
   const auto answer = raw->response();
@@ -213,7 +213,7 @@ TEST_F(WrongArgumentsTest, AnUnknownMethodIsRefusedByItsName) {
   }
   const std::string longName(10'000, 'm');
   expectRefused(longName, {}, 1, "unknown method " + longName.substr(0, 32));
-  // Refused for its name, whatever it brings.
+  // Refused because of its name, whatever its arguments are.
   expectRefused("nothing", {packed::nil(), packed::binary("x")}, 1, "unknown method nothing");
 }
 

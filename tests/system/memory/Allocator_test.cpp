@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The C library's own allocator, which sanitizers replace with others that have no such figures.
+// Tests the C library's allocator. Sanitizers replace it by allocators without these figures.
 #include <cstddef>
 #include <gtest/gtest.h>
 #include <memory>
@@ -14,7 +14,7 @@ namespace {
 
 using Block = std::unique_ptr<std::vector<char>>;
 
-// Small enough for the heap; large ones are given back as they are freed.
+// Small enough for the heap; large blocks are returned to the system when they are freed.
 constexpr std::size_t kBlockBytes = 1000;
 constexpr std::size_t kBlocks = std::size_t{64} << 10;
 constexpr std::size_t kMegabyte = std::size_t{1} << 20;
@@ -25,7 +25,7 @@ TEST(AllocatorTest, KnowsWhatItKeepsAndGivesItBack) {
   std::vector<Block> blocks(kBlocks);
   for (Block& block : blocks) block = std::make_unique<std::vector<char>>(kBlockBytes, 'x');
   const std::size_t inUse = allocator.idleBytes();
-  const Block last = std::move(blocks.back());  // at the heap's end: what lies before it stays
+  const Block last = std::move(blocks.back());  // at the end of the heap, so memory before it is not returned
   blocks.clear();
   const std::size_t freed = allocator.idleBytes();
   EXPECT_GT(freed, inUse + 50 * kMegabyte);

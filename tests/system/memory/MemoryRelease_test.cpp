@@ -1,8 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What large sessions, or a storm of frames that never end, took of the system's memory is the system's again
-// soon after, whichever way and by however many clients it came. Only with the C library's own allocator:
-// sanitizers bring others, which keep what they have.
+// Tests that the memory of large sessions, or of many incomplete frames, soon returns to the system, for both
+// transports and any number of clients. Only with the C library's allocator: sanitizers use others, which do
+// not return memory.
 #include <chrono>
 #include <list>
 #include <string>
@@ -24,19 +24,19 @@ constexpr ReporterID kSession = 77;
 constexpr AudioServiceType kLongFormAudio = 7;
 constexpr std::size_t kMegabyte = std::size_t{1} << 20;
 
-// What an idle daemon may have more than before: what the allocator is left with, and as much for caches that
-// have filled meanwhile.
+// How much more memory an idle daemon may have than before: the amount that the allocator may keep, and the
+// same amount for caches that have filled in between.
 constexpr std::size_t kBound = 2 * AllocatorReclaimer::kMaxIdleBytes;
-// The last look is after half of it.
+// The last check comes after half of it.
 constexpr std::chrono::seconds kPatience{2 * AllocatorReclaimer::kLastCheckSeconds};
 
 class MemoryReleaseTest : public DaemonTest {
  protected:
   void SetUp() override {
     if (kHasSanitizer) GTEST_SKIP() << "a sanitizer's allocator keeps what it has";
-    daemon.setEnvironment("TONEWERK_LOG", "default");  // what follows would be many lines
+    daemon.setEnvironment("TONEWERK_LOG", "default");  // otherwise the log would have many lines
     ASSERT_TRUE(daemon.start());
-    // Once around, so that what is made by the first session is there.
+    // One session first, so that everything that the first session makes exists.
     DaemonClient client = connect();
     client.create(kSession, kLongFormAudio);
     client.start(kSession);
@@ -47,20 +47,20 @@ class MemoryReleaseTest : public DaemonTest {
     ASSERT_GT(idle, 0U);
   }
 
-  // Fifty keys, and none like the one before.
+  // Fifty keys, with a number that differs in each message.
   static ValueMap payload(int number) {
     ValueMap payload{{"n", number}};
     for (int key = 0; key < 50; ++key) payload.set("key" + std::to_string(key), 1.5 * key);
     return payload;
   }
-  // A session of so many messages.
+  // Makes a session of `messages` messages.
   static void fillSession(DaemonClient& client, ReporterID session = kSession, int messages = kMessages) {
     client.create(session, kLongFormAudio);
     client.start(session);
     for (int message = 0; message < messages; ++message) {
       client.notify("sendMessage",
                     ReportingClient::messageArguments(payload(message), 4, kTypeStart, {session}));
-      // Now and then an answer, so that neither side has to keep what the other does not take.
+      // Waits for an answer now and then, so that neither side has to store what the other has not read yet.
       if (message % 1000 == 0) client.serviceType(session);
     }
     EXPECT_EQ(client.serviceType(session), kLongFormAudio);
@@ -72,7 +72,7 @@ class MemoryReleaseTest : public DaemonTest {
         << daemon.residentBytes() / kMegabyte << " MiB; idle it had " << idle / kMegabyte << " MiB";
   }
 
-  static constexpr int kMessages = 40'000;  // some 200 MB in the daemon's hands
+  static constexpr int kMessages = 40'000;  // about 200 MB in the daemon
   std::size_t idle = 0;
 };
 
@@ -94,7 +94,7 @@ TEST_F(MemoryReleaseTest, OfALargeSessionIsTheSystemsAgainWhenItsClientHasGone) 
   expectTheMemoryBack();
 }
 
-// None of them brings as much as would be worth a look by itself.
+// No single client sends enough to cause a check.
 TEST_F(MemoryReleaseTest, OfManySmallClientsIsTheSystemsAgainWhenTheirSessionsEndTogether) {
   constexpr int kClients = 100;
   std::list<DaemonClient> clients;
@@ -108,8 +108,8 @@ TEST_F(MemoryReleaseTest, OfManySmallClientsIsTheSystemsAgainWhenTheirSessionsEn
 }
 
 TEST_F(MemoryReleaseTest, OfAStormOfFramesThatNeverEndIsTheSystemsAgain) {
-  // The smallest array, again and again: each takes many times its two bytes. No connection brings as much
-  // as would be worth a look by itself.
+  // Small arrays of two bytes each, which need many times their size in memory. No single connection sends
+  // enough to cause a check.
   constexpr std::size_t kBytes = std::size_t{400} << 10;
   std::string frame = packed::arrayHeader(4) + packed::integer(0) + packed::integer(1) +
                       packed::text("sendMessage") + packed::arrayHeader(4) +
@@ -138,7 +138,7 @@ class DbusMemoryReleaseTest : public MemoryReleaseTest {
     ASSERT_TRUE(waitForLogLine("serving com.orvane.tonewerk.reporting on D-Bus"));
   }
 
-  // The slower way, on which the store keeps up: what there is to be given back is the session's alone.
+  // D-Bus is slower, so the store keeps up, and all memory to be returned belongs to the session.
   static void fillSession(DbusCaller& caller) {
     constexpr int kSlowMessages = kMessages + kMessages / 2;
     EXPECT_TRUE(caller.ask("CreateReportingSession", "x", kSession).boolean());
@@ -149,7 +149,7 @@ class DbusMemoryReleaseTest : public MemoryReleaseTest {
       appendMap(call.get(), payload(message));
       ASSERT_GE(sd_bus_message_append(call.get(), "uqax", 4, kTypeStart, 1, kSession), 0);
       caller.sendWithoutAnswer(call);
-      // Of what is under way a client may not have more than so much.
+      // The daemon limits the number of pending requests of a client.
       if (message % 200 == 0) expectServed(caller);
     }
     expectServed(caller);

@@ -3,7 +3,8 @@
 
 namespace tonewerk {
 
-// Whether this program, and the daemon built with it, has a sanitizer's allocator, which keeps what it has.
+// Whether this program, and the daemon built with it, uses a sanitizer's allocator, which does not return
+// memory.
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
 inline constexpr bool kHasSanitizer = true;
 #elif defined(__has_feature)

@@ -1,7 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// An audio program with signposts: so many threads, each with so many intervals "decode" around one "mix"
-// each. Prints what it measured of every interval by itself, in nanoseconds: "decode LEAST MOST".
+// An audio program with signposts. Each of THREADS threads has INTERVALS intervals "decode", each around one
+// interval "mix". For every interval the program prints its own measurement in nanoseconds: "decode LEAST
+// MOST".
 //
 //   signpost_program [THREADS [INTERVALS]]
 
@@ -17,8 +18,8 @@ namespace {
 
 struct Measured {
   const char* name;
-  long long least;  // from after the begin to before the end
-  long long most;   // from before the begin to after the end
+  long long least;  // from the end of begin() to the start of end()
+  long long most;   // from the start of begin() to the end of end()
 };
 
 long long now() {
@@ -27,7 +28,7 @@ long long now() {
       .count();
 }
 
-// An interval with `work` in it.
+// Runs `work` in an interval.
 template <typename Work>
 Measured measure(const char* name, std::uint64_t identifier, Work work) {
   const long long before = now();

@@ -23,7 +23,7 @@ namespace {
 
 constexpr std::chrono::milliseconds kPollInterval{10};
 
-// Variables that would lead a child to what is not the test's own.
+// Variables that would direct a child to files, sockets or services outside the test.
 constexpr std::array<std::string_view, 19> kForeignVariables = {
     "RUNTIME_DIRECTORY",
     "STATE_DIRECTORY",
@@ -46,7 +46,7 @@ constexpr std::array<std::string_view, 19> kForeignVariables = {
     "DBUS_STARTER_ADDRESS",
 };
 
-// Where there is no D-Bus, rather than the machine's own.
+// An address without a D-Bus, used in place of the machine's bus.
 constexpr const char* kSystemBusVariable = "DBUS_SYSTEM_BUS_ADDRESS";
 constexpr const char* kNoBus = "unix:path=/nonexistent/bus";
 
@@ -79,7 +79,7 @@ bool redirect(const std::string& path, int descriptor) {
   return file >= 0 && dup2(file, descriptor) >= 0;
 }
 
-// In the child, between fork and exec: only what is safe there.
+// Runs in the child between fork and exec; only async-signal-safe calls are allowed.
 [[noreturn]] void become(char* const* arguments, char* const* environment, const std::string& inputPath,
                          const std::string& outputPath, const std::string& errorPath, pid_t parent) {
   setpgid(0, 0);
@@ -122,7 +122,7 @@ bool ChildProcess::start(const ChildCommand& command, const std::string& outputP
     ADD_FAILURE() << "cannot start " << command.program << ": " << std::strerror(errno);
     return false;
   }
-  setpgid(identifier_, identifier_);  // here too, so that kill() finds the group at once
+  setpgid(identifier_, identifier_);  // in the parent too, so that kill() finds the group at once
   return true;
 }
 

@@ -14,7 +14,7 @@ DaemonClient::DaemonClient(const std::string& socketPath) {
 
 Answer DaemonClient::call(std::string_view method, const Arguments& arguments) {
   std::error_code error;
-  const std::optional<Answer> answer = client_->call(method, arguments, kSystemPatience, error);
+  const std::optional<Answer> answer = client_->call(method, arguments, kSystemTimeout, error);
   EXPECT_TRUE(answer) << method << " is not answered: " << error.message();
   return answer.value_or(Answer());
 }
@@ -80,7 +80,7 @@ std::vector<ReporterID> DaemonClient::allReporters() {
 
 void DaemonClient::start(ReporterID reporterID) {
   request("startReportingSessionForID", {Value(reporterID)});
-  // Requests are carried out in their order: once this one is answered, the start has been made.
+  // The daemon runs requests in order: once this one is answered, the session has been started.
   allReporters();
 }
 

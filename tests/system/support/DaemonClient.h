@@ -13,18 +13,18 @@
 
 namespace tonewerk {
 
-// A well-behaved client in a test: whatever goes wrong with its connection is a test failure.
+// A correct client for tests. Every problem with its connection is a test failure.
 class DaemonClient {
  public:
   explicit DaemonClient(const std::string& socketPath);
 
-  // Waits for the answer. One without error or result when there was none, which is a test failure.
+  // Waits for the answer. Without one, which is a test failure, the result has neither error nor result.
   Answer call(std::string_view method, const Arguments& arguments = {});
-  // The answer's handler adds the method's name to answered(), and error answers are test failures.
+  // Its answer adds the method's name to answered(). An error answer is a test failure.
   void request(std::string_view method, const Arguments& arguments);
   void notify(std::string_view method, const Arguments& arguments);
 
-  // These wait for their answers, which have to be as expected.
+  // These wait for their answers and expect success.
   void create(ReporterID reporterID);
   void create(ReporterID reporterID, AudioServiceType serviceType);
   void setConfiguration(ReporterID reporterID, const ValueMap& configuration);
@@ -35,10 +35,10 @@ class DaemonClient {
   AudioServiceType serviceType(ReporterID reporterID);
   std::vector<ReporterID> allReporters();
 
-  // Comes back when the daemon has started the session; the start's answer is still to come.
+  // Returns when the daemon has started the session. The start itself is answered later.
   void start(ReporterID reporterID);
 
-  // What request() sent and the daemon answered so far, in the order of the answers.
+  // The methods sent by request() that the daemon has answered so far, in the order of the answers.
   const std::vector<std::string>& answered() const { return *answered_; }
   bool waitForAnswers(std::size_t count);
 

@@ -9,18 +9,18 @@
 
 namespace tonewerk {
 
-// A test of one daemon.
+// Base of tests with one daemon.
 //
-// At the test's end a daemon that still runs has to end in order, and no run of it may have had anything that
-// a sanitizer reports. A test that ends the daemon itself looks at its status itself.
+// At the end of the test, a daemon that still runs must exit in order, and none of its runs may have had a
+// sanitizer report. A test that ends the daemon itself checks the status itself.
 class DaemonTest : public ::testing::Test {
  protected:
   void TearDown() override;
 
-  // A client that is connected, or a test failure.
+  // Returns a connected client; failure to connect is a test failure.
   DaemonClient connect() { return DaemonClient(daemon.socketPath()); }
 
-  // How many lines the daemon has written that hold both texts.
+  // The number of log lines that contain both texts.
   std::size_t logLinesWith(const std::string& text, const std::string& other = {}) const;
   bool waitForLogLine(const std::string& text) const;
 
@@ -33,7 +33,7 @@ class RunningDaemonTest : public DaemonTest {
   void SetUp() override { ASSERT_TRUE(daemon.start()); }
 };
 
-// Fails the test when a program built with a sanitizer said in `log` that something is wrong.
+// Fails the test when `log` contains a sanitizer report.
 void expectNoSanitizerReport(const std::string& log);
 
 }  // namespace tonewerk

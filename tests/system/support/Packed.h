@@ -7,10 +7,10 @@
 #include <string_view>
 #include <vector>
 
-// MessagePack written by hand, so that a test can send what no library would write.
+// Writes MessagePack by hand, so that a test can send bytes that no library would write.
 namespace tonewerk::packed {
 
-// The bytes of `value`, highest first.
+// The bytes of `value`, most significant first.
 template <typename Unsigned>
 std::string bigEndian(Unsigned value) {
   std::string bytes(sizeof(value), '\0');
@@ -33,7 +33,7 @@ inline std::string integer(std::int64_t value) {
 }
 inline std::string unsignedInteger(std::uint64_t value) { return byte(0xCF) + bigEndian(value); }
 
-// Headers that claim so much to come.
+// Headers that announce `count` elements or bytes.
 inline std::string arrayHeader(std::uint32_t count) { return byte(0xDD) + bigEndian(count); }
 inline std::string mapHeader(std::uint32_t count) { return byte(0xDF) + bigEndian(count); }
 inline std::string textHeader(std::uint32_t count) { return byte(0xDB) + bigEndian(count); }
@@ -60,7 +60,7 @@ inline std::string joined(const std::vector<std::string>& parts) {
 inline std::string array(const std::vector<std::string>& elements) {
   return arrayHeader(static_cast<std::uint32_t>(elements.size())) + joined(elements);
 }
-// Keys and values in turn.
+// Keys and values alternate.
 inline std::string map(const std::vector<std::string>& keysAndValues) {
   return mapHeader(static_cast<std::uint32_t>(keysAndValues.size() / 2)) + joined(keysAndValues);
 }

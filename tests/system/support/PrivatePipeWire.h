@@ -11,26 +11,26 @@
 
 namespace tonewerk {
 
-// A sound graph of the test's own: PipeWire, its session manager and their bus, without sound hardware, in a
-// runtime directory and a home of their own.
+// Runs a private audio graph for a test: PipeWire, its session manager and a bus, without sound hardware, in
+// a private runtime directory and home.
 class PrivatePipeWire {
  public:
   PrivatePipeWire();
 
-  // False, with a test failure, when it does not come up. May be called again after stop().
+  // False, with a test failure, when it does not start. May be called again after stop().
   bool start();
   void stop();
-  // A sink that swallows what it is given; the first becomes the default. It is gone after stop().
+  // Adds a sink that discards its audio; the first one becomes the default. It is gone after stop().
   bool addSink(const std::string& name, const std::string& description);
 
-  // The processes of the graph, and its players, run with this.
+  // The environment of the graph's processes and of its players.
   std::map<std::string, std::string> environment() const;
   std::optional<std::string> outputOf(const std::string& program, std::vector<std::string> arguments) const;
 
-  // A two-channel sine tone of so many seconds as a sound file; its path.
+  // Writes a two-channel sine tone of `seconds` seconds to a sound file, and returns its path.
   std::string makeTone(int seconds) const;
 
-  // The node of this name in the state "running"; none when there is none.
+  // The node of this name in the state "running", if there is one.
   std::optional<std::uint32_t> runningNode(const std::string& name) const;
   bool hasNode(const std::string& name) const;
 

@@ -9,8 +9,8 @@
 
 namespace tonewerk {
 
-// A terminal for a program of a test: what the program writes is collected, and keys can be pressed. A
-// program gets path() as its input and output.
+// Provides a terminal for a program of a test: collects the program's output and presses keys. The program
+// gets path() as its input and output.
 class PseudoTerminal {
  public:
   PseudoTerminal();
@@ -19,22 +19,22 @@ class PseudoTerminal {
   void resize(unsigned short columns, unsigned short rows) const;
   void press(std::string_view keys) const;
 
-  // Whether the program writes this in time, behind what was waited for before.
+  // Whether the program writes this text in time, after the text of the previous call.
   bool waitFor(const std::string& text);
-  // All that has been written.
+  // All output so far.
   const std::string& written();
 
-  // How keys and lines are treated now.
+  // The terminal's present modes.
   termios modes() const;
 
  private:
   void collect();
 
   FileDescriptor master_;
-  FileDescriptor slave_;  // so that the terminal outlives its programs
+  FileDescriptor slave_;  // kept open so that the terminal outlives its programs
   std::string path_;
   std::string written_;
-  std::size_t seen_ = 0;  // of written_, by waitFor()
+  std::size_t seen_ = 0;  // bytes of written_ that waitFor() has passed
 };
 
 }  // namespace tonewerk

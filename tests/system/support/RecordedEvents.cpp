@@ -9,7 +9,7 @@ namespace tonewerk {
 
 namespace {
 
-// For the moments in which the daemon recovers its write-ahead log.
+// How long to wait while the daemon recovers its write-ahead log.
 constexpr int kBusyMilliseconds = 10'000;
 
 struct Close {

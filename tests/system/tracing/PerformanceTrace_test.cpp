@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// A test session's trace, from a program's signposts to the benchmark data file, with the real tracer.
+// Tests a test session's trace, from a program's signposts to the benchmark data file, with the real tracer.
 #include <algorithm>
 #include <filesystem>
 #include <fstream>
@@ -22,10 +22,10 @@ using ::testing::SizeIs;
 constexpr ReporterID kSession = 77;
 constexpr AudioServiceType kTest = 11;
 constexpr double kNanosecondsPerMillisecond = 1e6;
-// Seconds and milliseconds lie between the trace's nanoseconds and the file.
+// The trace's nanoseconds are converted to seconds and to milliseconds before they reach the file.
 constexpr double kRounding = 1.0;
 
-// What a program measured of one name's intervals, each list in ascending order.
+// A program's measurements of the intervals of one name; each list is in ascending order.
 struct Measured {
   std::vector<double> least;
   std::vector<double> most;
@@ -38,7 +38,7 @@ class PerformanceTraceTest : public DaemonTest {
     daemon.setEnvironment("TONEWERK_SIGNPOSTS", TONEWERK_SIGNPOST_LIBRARY);
   }
 
-  // A started test session with this probe list.
+  // Starts a test session with this probe list.
   DaemonClient startTracing(const std::string& probes) {
     EXPECT_TRUE(daemon.writeConfiguration("probes.json", probes));
     EXPECT_TRUE(daemon.start());
@@ -76,7 +76,7 @@ class PerformanceTraceTest : public DaemonTest {
     return found;
   }
 
-  // The one file there is.
+  // The contents of the only file.
   json file() const {
     const auto paths = files();
     EXPECT_THAT(paths, SizeIs(1)) << daemon.log();
@@ -85,7 +85,7 @@ class PerformanceTraceTest : public DaemonTest {
     return json::parse(stream);
   }
 
-  // How long one name's intervals took, in nanoseconds, in ascending order.
+  // Durations of the intervals of one name, in nanoseconds, in ascending order.
   static std::vector<double> durations(const json& file, const std::string& name) {
     std::vector<double> found;
     for (const json& entry : file.at("benchmarks")) {
@@ -117,7 +117,7 @@ TEST_F(PerformanceTraceTest, ATestSessionLeavesHowLongItsIntervalsTook) {
     const std::vector<double> traced = durations(found, name);
     ASSERT_THAT(measured.least, SizeIs(500));
     ASSERT_THAT(traced, SizeIs(500)) << name;
-    // Each lies within its own bounds, and so does each rank within that rank's.
+    // Each duration lies within its own bounds, so the sorted durations also lie within the sorted bounds.
     for (std::size_t i = 0; i < traced.size(); ++i) {
       EXPECT_GE(traced[i] + kRounding, measured.least[i]) << name;
       EXPECT_LE(traced[i] - kRounding, measured.most[i]) << name;
