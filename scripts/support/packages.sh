@@ -1,28 +1,29 @@
-# Sourced by the scripts that try the packages of build/packages in a Debian of their own.
+# Sourced by the scripts that test the packages of build/packages in a separate Debian.
 
-# The suite that this runs on: the packages were built for it.
+# Prints the suite of this machine, for which the packages were built.
 suite() { (. /etc/os-release && echo "$VERSION_CODENAME"); }
 
-# Where this system has its packages from.
+# Prints the package mirror of this machine.
 mirror() {
   apt-get indextargets --format '$(REPO_URI)' 'Created-By: Packages' "Codename: $(suite)" 'Component: main' | head -1
 }
 
-# names_of FILE...: what the packages are called, in one line.
+# names_of FILE...: prints the names of the packages in one line.
 names_of() {
   local file
   for file in "$@"; do dpkg-deb --field "$file" Package; done | paste -sd' '
 }
 
-# dependencies_of FILE...: what the packages need besides each other, taking the first of alternatives.
+# dependencies_of FILE...: prints the dependencies of the packages, without the packages themselves. Takes the first of
+# alternatives.
 dependencies_of() {
   local file
   for file in "$@"; do dpkg-deb --field "$file" Pre-Depends Depends | sed 's/^[A-Za-z-]*: //' | tr ',' '\n'; done |
     sed 's/|.*//; s/(.*//; s/ //g; /^$/d' | grep -vxF "$(names_of "$@" | tr ' ' '\n')" | sort -u | paste -sd,
 }
 
-# build_examples SYSROOT DIRECTORY: the example programs, by the commands that they name, against nothing but the packages
-# of the library, which are unpacked to SYSROOT; the programs go to DIRECTORY. Ends with the command that failed.
+# build_examples SYSROOT DIRECTORY: builds the example programs with the commands in their own comments. Only the packages
+# of the library are available, unpacked to SYSROOT. The programs go to DIRECTORY. Stops at the first command that fails.
 build_examples() {
   local sysroot=$1 directory=$2 file program command
   mkdir -p "$sysroot"

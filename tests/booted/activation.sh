@@ -1,4 +1,4 @@
-# The first client starts the daemon; who may be one.
+# Tests that the first client starts the daemon, and which users may be clients.
 
 check 'somebody outside the group is refused' refuses as stranger twctl --system list
 check 'and told that it is for want of permission' says '[Pp]ermission denied' as stranger twctl --system list

@@ -1,4 +1,4 @@
-# The system is up, and of the daemon there is its socket alone.
+# Tests that after the boot only the socket of the daemon exists.
 
 check 'the system comes up with nothing failed' says '^running$' systemctl is-system-running --wait
 check 'AppArmor holds the daemon to its profile' grep -qx 'twreportingd (enforce)' /sys/kernel/security/apparmor/profiles

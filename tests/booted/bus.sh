@@ -1,9 +1,10 @@
-# The system's message bus: who may call, who may have the name, and that a call starts the daemon.
+# Tests the system's message bus: which users may call, which may own the name, and that a call starts the daemon.
 
 bus_name=com.orvane.tonewerk.reporting
 ask() { busctl --system --timeout=30 call $bus_name /com/orvane/tonewerk/reporting com.orvane.tonewerk.TWReportingServiceProtocol "$@"; }
 ask_as() { as "$1" bash -c "$(declare -f ask); bus_name=$bus_name; ask ${*:2}"; }
-# take_name_as USER: asks the bus for the daemon's name; 1 would say that it is the owner now, 2 that it waits for the name.
+# take_name_as USER: requests the daemon's name from the bus. An answer of 1 means that the user now owns the name, 2 that it
+# waits for the name.
 take_name_as() {
   as "$1" busctl --system call org.freedesktop.DBus /org/freedesktop/DBus org.freedesktop.DBus RequestName su $bus_name 0
 }

@@ -1,4 +1,4 @@
-# What the recording that `internal` began has provoked.
+# Tests the diagnostics that were caused by the recording which `internal` started.
 
 check 'the recording was played to its end' eval 'wait $diagnostics || { cat /tmp/diagnostics.log; false; }'
 how_many() { twctl --system --json "$1" | grep -c .; }

@@ -1,12 +1,12 @@
-# What the topics are written in. Sourced by `run`; file descriptor 3 takes the results, one line a check, and what a failed
-# one printed below it.
+# Functions for the topics. Sourced by `run`. Results go to file descriptor 3: one line for each check, and below it the
+# output of a failed check.
 
 begin_topic() {
   printf '\n===== %s\n' "$1"
   printf '%s\n' "-- $1 ($(cut -d. -f1 /proc/uptime) s)" >&3
 }
 
-# check NAME COMMAND...: whether the command succeeds.
+# check NAME COMMAND...: runs the command and reports whether it succeeds.
 check() {
   local name=$1 output=/tmp/check
   shift
@@ -21,7 +21,7 @@ check() {
   fi
 }
 
-# await COMMAND...: repeats the command until it succeeds; the bound is far above what anything here takes.
+# await COMMAND...: repeats the command until it succeeds. The time limit is far above the duration of any step here.
 await() {
   local end=$((SECONDS + 120))
   until "$@"; do
@@ -30,14 +30,14 @@ await() {
   done
 }
 
-# refuses COMMAND...: succeeds when the command fails with a status of its own (not by a signal, not for not being found).
+# refuses COMMAND...: succeeds when the command itself fails (a signal or a missing program does not count).
 refuses() {
   local status=0
   "$@" || status=$?
   [ $status -gt 0 ] && [ $status -lt 126 ]
 }
 
-# says PATTERN COMMAND...: succeeds when the command prints a line that matches, whatever its status.
+# says PATTERN COMMAND...: succeeds when the command prints a matching line; its status does not matter.
 says() {
   local pattern=$1 output
   shift
@@ -48,7 +48,7 @@ says() {
 
 equal() { [ "$1" = "$2" ] || { printf 'found:    %s\nexpected: %s\n' "$1" "$2"; return 1; }; }
 
-# as USER COMMAND...: with the user's groups and nothing else of a session; with the user's runtime directory where there is one.
+# as USER COMMAND...: runs the command as the user, with the user's groups and runtime directory, but without a login session.
 as() {
   local user=$1 runtime
   shift
@@ -62,12 +62,13 @@ state() { systemctl show --value --property "$1" $unit; }
 daemon() { state MainPID; }
 is_in_state() { [ "$(systemctl is-active "${2:-$unit}")" = "$1" ]; }
 
-# restart_daemon: ends the daemon in order and has the next client start another.
+# restart_daemon: ends the daemon in order and lets the next client start a new one.
 stop_daemon() { systemctl stop $unit && is_in_state inactive; }
 start_daemon() { twctl --system list >/dev/null && is_in_state active; }
 restart_daemon() { stop_daemon && start_daemon; }
 
-# What the kernel has denied since the last look, and the message bus.
+# Lists what the kernel and the message bus have denied. has_no_new_denials succeeds when nothing was denied since its last
+# call.
 denials_seen=0
 denials() { journalctl --boot --output cat --grep 'apparmor="DENIED"' --case-sensitive --quiet; }
 has_no_new_denials() {
@@ -80,7 +81,7 @@ has_no_new_denials() {
   [ $new -eq 0 ] || { tail -n $new <<<"$all"; return 1; }
 }
 
-# has_rows TABLE [WHERE ...]: whether the store of the system's daemon has such rows.
+# has_rows TABLE [WHERE ...]: succeeds when the store of the system's daemon has matching rows.
 store=/var/lib/tonewerk/reports.db
 has_rows() { [ "$(sqlite3 -readonly $store "SELECT count(*) FROM $*")" -gt 0 ]; }
 stored() { has_rows "analytics_event WHERE name = '$1'"; }

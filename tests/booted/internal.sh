@@ -1,6 +1,6 @@
-# The device becomes that of somebody who develops for it: an internal build, and all that it can do switched on.
+# Makes the device a development device: an internal build with all its features enabled.
 
-# Channels are known from a daemon's first session on.
+# The daemon subscribes to channels at its first session, so they are published before.
 cp driver-channels.json /run/tonewerk/channels/.amp.new
 chown player:audio /run/tonewerk/channels/.amp.new
 mv /run/tonewerk/channels/.amp.new /run/tonewerk/channels/amp.json
@@ -19,6 +19,6 @@ check 'which stay the daemon'\''s' \
 restart_daemon
 check 'programs are told that they can be traced' await test -e /run/tonewerk/signposts
 
-# Diagnostics go by the daemon's clock, for more than a minute; `diagnostics` looks at what has come of this.
+# Diagnostics depend on the daemon's clock and take more than a minute. The topic `diagnostics` checks their results.
 as player twctl --system replay /tests/diagnostics.jsonl >/tmp/diagnostics.log 2>&1 &
 diagnostics=$!

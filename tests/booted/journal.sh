@@ -1,6 +1,6 @@
-# What the daemon says is in the journal with its fields.
+# Tests that the lines of the daemon are in the journal with their fields.
 
-# The kinds of entries of the daemon's, with how many there are: PRIORITY LEVEL IDENTIFIER CATEGORY SUBSYSTEM.
+# Counts the daemon's entries by kind: PRIORITY LEVEL IDENTIFIER CATEGORY SUBSYSTEM.
 entries() {
   journalctl --boot --output json --unit $unit _COMM=twreportingd | python3 -c '
 import json, sys

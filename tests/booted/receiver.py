@@ -1,5 +1,5 @@
 #!/usr/bin/env python3
-# Takes OTLP requests on the loopback interface, and prints one line each: the path and the body.
+# Receives OTLP requests on the loopback interface, and prints one line for each: the path and the body.
 import gzip
 import http.server
 import sys

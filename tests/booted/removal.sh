@@ -1,21 +1,21 @@
-# The packages go from a running system, without a complaint.
+# Tests that the packages can be removed from a running system without errors.
 
 export DEBIAN_FRONTEND=noninteractive
-# The owner's, which no package removes.
+# These files belong to the device's owner; no package removes them.
 rm -r /etc/systemd/system/$unit.d
 systemctl daemon-reload
 packages=$(dpkg-query --show --showformat '${Package} ' 'tonewerk-*' 'libtwreporting*')
-# complaint FILE: lines of dpkg's that are not about what it does.
+# complaint FILE: prints the lines of dpkg that are not about its normal work.
 complaint() { grep -vE '^(\(Reading database|Removing |Purging configuration|Processing triggers)' "$1"; }
 
-# Somebody whose service manager has no message bus.
+# A user whose service manager has no message bus.
 loginctl enable-linger stranger
 has_manager() { as "$1" systemctl --user --quiet is-active sockets.target; }
 check 'a second user has a service manager' await has_manager stranger
 check 'and the socket' as stranger systemctl --user --quiet is-active twreportingd.socket
 check 'but no message bus' as stranger systemctl --user stop dbus.socket dbus.service
 
-# left_of PACKAGE...: those of which dpkg still keeps something.
+# left_of PACKAGE...: prints those packages of which dpkg still keeps configuration files.
 left_of() { dpkg-query --show --showformat '${Package} ${db:Status-Status}\n' "$@" 2>/dev/null | sed -n 's/ config-files$//p'; }
 check 'the packages are removed' eval 'dpkg --remove $packages >/tmp/removal 2>&1 || { cat /tmp/removal; false; }'
 check 'the removal complains of nothing' eval '! complaint /tmp/removal'
@@ -31,7 +31,7 @@ check 'nor the user' refuses getent passwd tonewerk
 check 'the system has nothing that failed' equal "$(systemctl --no-legend --plain list-units --failed)" ''
 check 'what the user has kept is the user'\''s' test -s /home/player/.local/state/tonewerk/reports.db
 
-# And back again, which a service manager sees this time.
+# Installs the packages again, now with a running service manager.
 check 'the packages install on a running system' eval 'dpkg --install /tests/{lib,tonewerk}*.deb >/tmp/install 2>&1 || { cat /tmp/install; false; }'
 check 'the installation complains of nothing' eval '! grep -vE "^(Selecting|Preparing|Unpacking|Setting up|Processing|Created symlink|\(Reading|Creating|/usr/lib/tmpfiles)" /tmp/install'
 check 'the first client is served at once' as player twctl --system list

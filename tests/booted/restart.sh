@@ -1,6 +1,6 @@
-# However the daemon ends, the next client has one.
+# Tests that the next client starts a new daemon, in whatever way the old one ended.
 
-# has_another PID: whether a daemon runs, and it is not that process.
+# has_another PID: succeeds when a daemon runs that is not this process.
 has_another() { is_in_state active && [ "$(daemon)" != "$1" ]; }
 
 before=$(daemon)

@@ -1,7 +1,7 @@
-# What the unit closes is closed, as the kernel has it.
+# Tests in the kernel that the restrictions of the unit are in force.
 
 status_of_daemon() { awk -v key="$1:" '$1 == key { print $2 }' "/proc/$(daemon)/status"; }
-# in_its_place COMMAND...: where the daemon lives, with root's rights but for what is mounted how.
+# in_its_place COMMAND...: runs the command in the daemon's mount namespace, with the rights of root.
 in_its_place() { nsenter --target "$(daemon)" --mount -- "$@"; }
 
 check 'the daemon has no capabilities' equal "$(status_of_daemon CapEff)" 0000000000000000

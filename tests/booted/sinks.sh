@@ -1,4 +1,4 @@
-# Every way out of the daemon, and everything that reaches a running session from outside.
+# Tests every sink of the daemon, and every input from outside that reaches a running session.
 
 python3 /tests/receiver.py 4318 >/tmp/received 2>/tmp/receiver.log &
 receiver=$!
@@ -22,7 +22,7 @@ check 'as JSON, for the group tonewerk' summaries_are_as_they_should_be
 check 'the tools read each of them' eval 'twctl --system events | grep -q Volume && twctl --system power | grep -q Haptic &&
   twctl --system metrics | grep -q . && twctl --system rtc | grep -q .'
 
-# A session that somebody holds open.
+# A session that a client holds open.
 printf '%s\n' '{"at": 0, "call": "createReportingSession", "params": [41]}' '{"at": 0, "call": "setServiceType", "params": [7, 41]}' \
   '{"at": 0, "call": "startReportingSessionForID", "params": [41]}' '{"at": 3000, "call": "stopReportingSessionForID", "params": [41]}' \
   >/tmp/hold.jsonl
@@ -49,7 +49,7 @@ mv /run/tonewerk/channels/.amp.new /run/tonewerk/channels/amp.json
 pkill --parent $holder
 check 'what changed in them is reported when the session ends' await stored_with AmpDrv_Speaker_Simple_RailVolts
 
-# The examples' summaries, of which each program adds one.
+# Counts the summaries of the examples; each program adds one.
 example_summaries() {
   sqlite3 -readonly $store "SELECT count(*) FROM analytics_event
     WHERE name = 'com.orvane.longformaudio.Volume.Summary' AND payload LIKE '%org.example.Report%'"

@@ -1,5 +1,5 @@
-# Performance traces. By itself the daemon traces what its own user runs; with root's session daemon, and in the group that
-# may talk to it, what everybody runs.
+# Tests performance traces. Alone, the daemon traces programs of its own user. With root's session daemon, and in the group
+# that may use it, the daemon traces the programs of all users.
 
 cat >/etc/tonewerk/probes.json <<'END'
 [{"name": "Requests", "children": [{"name": "sendMessage", "type": "interval"}]}, {"name": "decode", "type": "interval"}]
@@ -14,11 +14,12 @@ cat >/tmp/trace.jsonl <<'END'
 END
 
 traces=/var/log/tonewerk/Audio/Traces
-# What has become of starts so far, good or bad.
+# Lists the results of all starts so far, successful or not.
 starts() { journalctl --boot --unit $unit --output cat --grep 'Performance Trace Started|runtraceDidStart' --quiet; }
 has_more_starts() { [ "$(starts | wc -l)" -gt "$1" ]; }
-# start_trace FILE: a test session, held open by the process `holder`. The session daemon has five seconds to come up, which
-# an emulated processor on a busy machine may not be quick enough for: then the session ends, and another may be tried.
+# start_trace FILE: starts a test session, which the process `holder` keeps open. The session daemon must start within five
+# seconds. An emulated processor on a busy machine may be too slow for that: then the session ends, and the call may be
+# repeated.
 start_trace() {
   local before
   before=$(starts | wc -l)
@@ -34,7 +35,7 @@ end_session() {
   wait $holder
   true
 }
-# record FILE: a trace of programs of the daemon's user and of another, with 5 and 7 intervals.
+# record FILE: records a trace of a program of the daemon's user (5 intervals) and of another user's (7 intervals).
 record() {
   await start_trace "$1" || return 1
   runuser -u tonewerk -- env HOME=/var/lib/tonewerk /tests/signpost_program 1 5 >/dev/null

@@ -1,5 +1,5 @@
-# A new version of the package on a running system, in which a configuration file that the device's owner has changed is
-# another one, too.
+# Tests the upgrade to a new version of the package on a running system. A configuration file that the device's owner has
+# changed also differs in the new version.
 
 export DEBIAN_FRONTEND=noninteractive
 before=$(daemon)
@@ -18,7 +18,7 @@ check 'the socket is served and belongs to the group' equal "$(stat --format '%U
 check 'what was stored is there' stored com.orvane.standalone.Playback.Start
 check "the user's socket waits" as player systemctl --user --quiet is-active twreportingd.socket
 
-# A link in the place of the daemon's preferences, as whoever broke into the daemon could make one.
+# A link in place of the daemon's preferences. An attacker with the rights of the daemon could make one.
 stop_daemon
 mv $preferences $preferences.away
 mkdir /tmp/of-root

@@ -1,4 +1,4 @@
-# A user's own daemon under the user's service manager, and the bridge to PipeWire.
+# Tests a user's own daemon under the user's service manager, and the PipeWire bridge.
 
 user_unit() { as player systemctl --user "$@"; }
 user_daemon() { user_unit show --value --property MainPID $unit; }
@@ -22,7 +22,7 @@ check 'a preference is written and kept at home' eval 'as player twctl defaults 
 check 'an example reports to it, and prints the report that came of it' says 'Volume.Summary.*org.example.Report' as player /tests/report.c.out
 check 'from the store at home' user_stored "name = 'com.orvane.longformaudio.Volume.Summary' AND payload LIKE '%org.example.Report%'"
 
-# PipeWire is started by its socket; there is no sound card, so a sink of its own.
+# PipeWire is started by its socket. The guest has no sound card, so a virtual sink is created.
 check 'the bridge starts' user_unit enable --now --quiet tw-pipewire.service pipewire.service wireplumber.service
 await as player pw-cli info 0 >/dev/null
 as player pw-cli create-node adapter '{ factory.name=support.null-audio-sink node.name=hall node.description="The hall"

@@ -1,5 +1,5 @@
 # SPDX-License-Identifier: Apache-2.0
-"""The commands that pages print are commands that the programs take."""
+"""Checks that the commands on the pages exist in the programs."""
 
 import re
 import shlex
@@ -11,7 +11,7 @@ PAGES = [SOURCE / "README.md", *sorted((SOURCE / "docs").rglob("*.md")), *sorted
 
 
 def blocks(page):
-    """What a reader would type: shell blocks of Markdown, displays of manual pages."""
+    """Returns the commands to type: shell blocks of Markdown, displays of manual pages."""
     text = page.read_text()
     if page.suffix == ".md":
         return re.findall(r"^```sh\n(.*?)^```", text, re.DOTALL | re.MULTILINE)
@@ -19,7 +19,7 @@ def blocks(page):
 
 
 def commands(page):
-    """The words of each call of one of our programs."""
+    """Returns the words of each call of one of the project's programs."""
     calls = []
     for block in blocks(page):
         if "#include" in block or "import " in block:
@@ -41,7 +41,7 @@ def commands(page):
 
 
 def options_of(call):
-    """What the command of a call takes, and whether its words name one."""
+    """Returns the help page of the command in a call, or that of the program when the call names no command."""
     pages = {tuple(page.command): page for page in help_pages(call[0])}
     path = ()
     for word in call[1:]:

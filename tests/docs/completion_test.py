@@ -1,5 +1,5 @@
 # SPDX-License-Identifier: Apache-2.0
-"""Bash completion offers what the programs take: no more and no less."""
+"""Checks that bash completion offers exactly what the programs accept."""
 
 import pathlib
 import re
@@ -10,7 +10,7 @@ from programs import NAMES, PROGRAMS, SOURCE, help_pages, run
 
 SCRIPTS = SOURCE / "packaging/completion"
 
-# As readline calls it: the words so far, of which the last is the one under way.
+# Calls the completion as readline does, with the words so far. The last word is the one to complete.
 DRIVER = """
 set -euo pipefail
 compopt() { :; } # which works inside readline only
@@ -76,7 +76,7 @@ class CompletionTest(unittest.TestCase):
         self.assertEqual(self.offers("twctl", "captures", "show", "--lat"), ["--latest"])
 
     def refusal(self, *arguments):
-        """What twctl says is wrong with a message; nothing when it only finds no daemon."""
+        """Returns what twctl reports as wrong with a message; empty when it only finds no daemon."""
         answer = run(
             [PROGRAMS / "twctl", "send", *arguments, "key=1"],
             env={"TONEWERK_REPORTING_SOCKET": str(self.scratch / "none")},

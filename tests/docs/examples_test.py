@@ -1,5 +1,5 @@
 # SPDX-License-Identifier: Apache-2.0
-"""What examples send is what reports are made of."""
+"""Checks that the examples send the keys from which reports are made."""
 
 import re
 import unittest

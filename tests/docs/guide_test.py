@@ -1,5 +1,5 @@
 # SPDX-License-Identifier: Apache-2.0
-"""What the guide gives to type finds what it is about."""
+"""Checks that the commands of the guide find the files that they use."""
 
 import re
 import signal

@@ -1,5 +1,5 @@
 # SPDX-License-Identifier: Apache-2.0
-"""The links of README.md, CONTRIBUTING.md and docs lead somewhere."""
+"""Checks that the links of README.md, CONTRIBUTING.md and docs exist."""
 
 import re
 import unittest
@@ -11,12 +11,12 @@ ROOMS = "src|include|tests|benchmarks|fuzz|docs|examples|packaging|scripts"
 
 
 def prose(page):
-    """The page without its code blocks."""
+    """Returns the page without its code blocks."""
     return re.sub(r"^```.*?^```", "", page.read_text(), flags=re.DOTALL | re.MULTILINE)
 
 
 def anchors(page):
-    """What a heading is called in an address: lower case, without punctuation, a dash for a space."""
+    """Returns the anchors of the headings: lower case, without punctuation, a dash for a space."""
     headings = re.findall(r"^#+ (.*)", prose(page), re.MULTILINE)
     return {re.sub(r"[^\w\- ]", "", heading.lower()).replace(" ", "-") for heading in headings}
 

@@ -1,5 +1,5 @@
 # SPDX-License-Identifier: Apache-2.0
-"""The manual pages: clean for groff, and complete for what the programs take."""
+"""Checks that the manual pages are clean for groff, and explain everything that the programs accept."""
 
 import re
 import unittest
@@ -13,7 +13,7 @@ SECTIONS_OF_PROGRAMS = ["OPTIONS", "EXIT STATUS", "ENVIRONMENT", "FILES", "EXAMP
 
 
 def parts(text, macro):
-    """The text below each heading, with the heading's own line in front."""
+    """Returns the text below each heading, beginning with the heading's own line."""
     return re.findall(rf"^\.{macro} .*\n(?:(?!\.{macro} ).*\n)*", text, re.MULTILINE)
 
 
@@ -22,7 +22,7 @@ def section(page, heading):
 
 
 def explained_options(text):
-    """The options that items of lists are about, as ".It Fl v , -verbose"."""
+    """Returns the options that list items explain, such as ".It Fl v , -verbose"."""
     items = re.findall(r"^\.It .*", text, re.MULTILINE)
     lists = [options for item in items for options in re.findall(r"Fl (-?[a-z][a-z-]*(?: , -?[a-z][a-z-]*)*)", item)]
     return {"-" + option for options in lists for option in options.split(" , ")}
@@ -73,7 +73,7 @@ class ManualPagesTest(unittest.TestCase):
         wanted = {text: set() for text in sections}
         for page in commands:
             with self.subTest(command=str(page)):
-                # Below a heading of its own, or those for all of the same first word.
+                # A command has a heading of its own, or shares those with the same first word.
                 headings = {text: words(text.splitlines()[0]) for text in sections}
                 below = [text for text in sections if set(page.command) <= headings[text]]
                 below = below or [text for text in sections if page.command[0] in headings[text]]
@@ -109,14 +109,14 @@ class ManualPagesTest(unittest.TestCase):
             for name, number in references:
                 self.assertIn(f"{name}.{number}", names, page.name)
 
-    def test_tell_of_every_variable_that_the_sources_read(self):
+    def test_mention_every_variable_that_the_sources_read(self):
         sources = [path.read_text() for room in ("src", "include") for path in (SOURCE / room).rglob("*.[hc]*")]
         pattern = r'(?:getenv|[vV]ariable|serviceDirectory|userDirectory|choose)\((?:environment, )?"([A-Z_]+)"(?:, "([A-Z_]+)")?'
         variables = {name for text in sources for match in re.findall(pattern, text) for name in match if name}
         variables |= {name for text in sources for name in re.findall(r'k\w*Variable = "([A-Z_]+)"', text)}
         self.assertGreater(len(variables), 8)
-        told = "\n".join(page.read_text() for page in PAGES)
-        self.assertEqual({name for name in variables if name not in told}, set())
+        text = "\n".join(page.read_text() for page in PAGES)
+        self.assertEqual({name for name in variables if name not in text}, set())
 
 
 if __name__ == "__main__":

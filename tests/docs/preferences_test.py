@@ -1,5 +1,5 @@
 # SPDX-License-Identifier: Apache-2.0
-"""The schema of the preferences, their manual page, the files that are shipped and the sources that read them."""
+"""Compares the schema of the preferences with their manual page, the shipped files and the sources that read them."""
 
 import json
 import pathlib
@@ -21,7 +21,7 @@ def schema():
 
 
 def explained():
-    """What the manual page says of each key: its type and its default, as texts."""
+    """Returns type and default of each key in the manual page, as texts."""
     page = (SOURCE / "docs/man/tonewerk-reporting-preferences.5").read_text().replace(r"\(dq", '"')
     found = {}
     for domain, text in re.findall(r"^\.Ss (com\.\S+)\n(.*?)(?=^\.S[sh] )", page, re.DOTALL | re.MULTILINE):
@@ -31,7 +31,7 @@ def explained():
 
 
 def without_comment_marks(path):
-    """The file as somebody makes use of it: with its settings in force."""
+    """Returns the file with all its settings enabled."""
     return "".join(line[1:] if re.match(r"#\[|#\w+ =", line) else line for line in path.read_text().splitlines(True))
 
 

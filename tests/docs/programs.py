@@ -1,5 +1,5 @@
 # SPDX-License-Identifier: Apache-2.0
-"""The built programs as their own --help describes them, and the places of the tree."""
+"""Reads the --help of the built programs, and defines the paths of the tree."""
 
 import os
 import pathlib
@@ -16,15 +16,15 @@ def run(arguments, **options):
 
 
 class Help:
-    """One help text: of a program, or of a command of a program."""
+    """One help text, of a program or of one of its commands."""
 
     def __init__(self, program, command):
         self.program = program
-        self.command = command  # the words behind the program's name
+        self.command = command  # the words after the program's name
         answer = run([PROGRAMS / program, *command, "--help"])
         if answer.returncode != 0:
             raise AssertionError(f"{self}: --help ended with {answer.returncode}: {answer.stderr}")
-        if program == "twreportingd":  # which has no library for its few words
+        if program == "twreportingd":  # which prints its help without a library
             lines = [line for line in answer.stdout.splitlines() if line.startswith("Usage:")]
         else:
             lines = self._table(answer.stdout, "Options")
@@ -38,7 +38,7 @@ class Help:
 
     @staticmethod
     def _table(text, title):
-        """The first column of one of the tables: what is indented by two spaces."""
+        """Returns the first column of one of the tables: the words indented by two spaces."""
         found = re.search(rf"^{title}:\n((?:  .*\n)*)", text, re.MULTILINE)
         rows = found.group(1).splitlines() if found else []
         return [re.split(r"  +", row.strip())[0] for row in rows if not row.startswith("   ")]
@@ -48,10 +48,10 @@ _pages = {}
 
 
 def help_pages(program):
-    """All help texts of a program, its own first, then those of its commands and theirs."""
+    """Returns all help texts of a program: its own first, then those of its commands and their commands."""
     if program not in _pages:
         pages = [Help(program, [])]
-        for page in pages:  # grows while it is walked
+        for page in pages:  # the list grows during the loop
             pages.extend(Help(program, [*page.command, command]) for command in page.commands)
         _pages[program] = pages
     return _pages[program]

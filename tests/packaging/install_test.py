@@ -1,5 +1,5 @@
 # SPDX-License-Identifier: Apache-2.0
-"""`cmake --install`: everything below the prefix that it is given, and nothing in there that means another one."""
+"""Tests `cmake --install`: all files are below the given prefix, and no file refers to another prefix."""
 
 import os
 import pathlib
@@ -9,7 +9,7 @@ import tempfile
 import unittest
 
 BUILD = os.environ["TONEWERK_BUILD"]
-# Files that tell other programs where ours are.
+# Places of files that tell other programs the paths of the installed ones.
 TELLING = ["lib/systemd", "share/dbus-1", "etc/apparmor.d", "lib/pkgconfig", "lib/*/pkgconfig"]
 
 
@@ -29,7 +29,7 @@ class InstallTest(unittest.TestCase):
         self.scratch = pathlib.Path(scratch.name)
 
     def install(self, prefix):
-        """Under another root, where everything shows, also what would be outside of the prefix."""
+        """Installs below another root, so that files outside the prefix are found too."""
         environment = {**os.environ, "DESTDIR": str(self.scratch)}
         run([os.environ["TONEWERK_CMAKE"], "--install", BUILD, "--prefix", prefix], env=environment)
         return {str(path.relative_to(self.scratch)) for path in self.scratch.rglob("*") if not path.is_dir()}
@@ -64,7 +64,7 @@ class InstallTest(unittest.TestCase):
         package = next(path for path in self.telling_files(tree) if path.name == "twreporting.pc")
         self.assertIn(f"prefix={prefix}\n", package.read_text())
         for name in ["twreportingd", "tw-pipewire", "tw-memory-usage", "twctl"]:
-            # By themselves: with nothing said of where the client library is.
+            # They must find the client library without any setting.
             self.assertRegex(run([tree / "bin" / name, "--version"], env={}), r"\d+\.\d+\.\d+")
 
     def test_below_usr_is_the_systems(self):

@@ -1,5 +1,5 @@
 # SPDX-License-Identifier: Apache-2.0
-"""scripts/check-includes against copies of src/ with one thing wrong in each."""
+"""Tests scripts/check-includes with copies of src/ that each contain one error."""
 
 import pathlib
 import shutil
@@ -32,7 +32,7 @@ class CheckIncludesTest(unittest.TestCase):
         self.assertIn(problem, output)
         self.assertNotEqual(status, 0)
 
-    def test_has_nothing_to_say_of_the_sources_as_they_are(self):
+    def test_accepts_the_present_sources(self):
         self.assertEqual(self.check(), (0, ""))
 
     def test_refuses_a_room_above(self):
@@ -50,7 +50,7 @@ class CheckIncludesTest(unittest.TestCase):
                 self.plant(room, f'#include "{above}/Anything.h"')
                 self.refuses(f"may not include {above}/Anything.h")
 
-    def test_refuses_a_library_that_another_room_has(self):
+    def test_refuses_a_library_of_another_room(self):
         self.plant("platform/linux/json/JsonTree.cpp", "#include <sqlite3.h>")
         self.refuses("platform/linux/json may not use sqlite: <sqlite3.h>")
 
@@ -63,18 +63,18 @@ class CheckIncludesTest(unittest.TestCase):
         self.plant("attic/Old.cpp", "")
         self.refuses("src/attic/Old.cpp: its room attic is not in src/rooms.txt")
 
-    def test_refuses_an_arrow_that_nothing_uses(self):
+    def test_refuses_an_unused_dependency(self):
         table = self.copy / "src/rooms.txt"
         table.write_text(table.read_text().replace("\nprotocol: values\n", "\nprotocol: values\nsession2: values\n"))
         self.refuses("src/rooms.txt: there is no room session2")
         self.refuses("src/rooms.txt: session2 does not use values")
 
-    def test_refuses_an_arrow_upwards(self):
+    def test_refuses_an_upward_dependency(self):
         table = self.copy / "src/rooms.txt"
         table.write_text(table.read_text().replace("\nprotocol: values\n", "\nprotocol: values session\n"))
         self.refuses("src/rooms.txt: protocol names session, which does not stand above it in the table")
 
-    def test_refuses_another_table_in_the_architecture(self):
+    def test_refuses_a_different_table_in_the_architecture(self):
         page = self.copy / "docs/architecture.md"
         page.write_text(page.read_text().replace("\nprotocol: values\n", "\nprotocol: values session\n"))
         self.refuses("docs/architecture.md: its table of rooms is not that of src/rooms.txt")
