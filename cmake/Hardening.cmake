@@ -1,14 +1,15 @@
-# What the distribution builds its own programs with, as `DEB_BUILD_MAINT_OPTIONS=hardening=+all dpkg-buildflags` says it,
-# for every target: an overrun or a wrong index ends the process where it happens. Control-flow protection and the
-# library's assertions come on top. `scripts/check-hardening` compares this with the distribution, and reads it from the binaries.
+# The options with which the distribution builds its own programs, as printed by
+# `DEB_BUILD_MAINT_OPTIONS=hardening=+all dpkg-buildflags`, for every target: an overrun or a wrong index ends the process where
+# it happens. Control-flow protection and the library's assertions are added. `scripts/check-hardening` compares these options
+# with the distribution's, and checks the binaries.
 include(CheckPIESupported)
 check_pie_supported(LANGUAGES C CXX)
 set(CMAKE_POSITION_INDEPENDENT_CODE ON)
-# What only programs are linked from need not reckon with a symbol that another library replaces, which costs calls.
+# Code that is linked only into programs: no other library can replace its symbols, so calls need no indirection.
 add_compile_options($<$<STREQUAL:$<TARGET_PROPERTY:TYPE>,STATIC_LIBRARY>:-fPIE>)
 
 add_compile_options(-fstack-protector-strong -Wformat -Werror=format-security)
-# The C library refuses this one without optimisation. A package's own level stands.
+# The C library refuses this option without optimisation. A level that a package sets is kept.
 if(NOT "${CMAKE_C_FLAGS} ${CMAKE_CXX_FLAGS}" MATCHES "_FORTIFY_SOURCE")
   add_compile_options($<$<CONFIG:Release,RelWithDebInfo,MinSizeRel>:-D_FORTIFY_SOURCE=2>)
 endif()

@@ -1,7 +1,7 @@
-# The rooms of src/ as targets, out of src/rooms.txt: tonewerk_room_<path, "_" for "/"> is a static library of the folder's
-# sources that links the rooms and libraries which the table names, so that a use of anything else fails to link.
+# Makes a target of each room of src/ from src/rooms.txt. tonewerk_room_<path, with "_" for "/"> is a static library of the
+# folder's sources. It links only the rooms and libraries in the table, so using anything else fails to link.
 
-# Where each library of the table comes from; those without a target are headers that the system keeps at their place.
+# The target of each library in the table. A library without a target consists of headers in the system directories.
 set(room_library_threads Threads::Threads)
 set(room_library_systemd PkgConfig::SYSTEMD)
 set(room_library_sqlite PkgConfig::SQLITE)
@@ -16,7 +16,7 @@ set(room_library_lttng-ust PkgConfig::LTTNG_UST)
 set(room_library_babeltrace PkgConfig::BABELTRACE)
 set(room_library_msgpack)
 set(room_library_protozero)
-# What others see of these rooms.
+# The targets that other rooms link in place of these rooms.
 set(room_target_tonewerk tonewerk_options)
 set(room_target_client twreporting)
 
@@ -29,7 +29,7 @@ function(tonewerk_room_target variable room)
   endif()
 endfunction()
 
-# The folder's sources but for the programs' main.cpp, found by themselves, so that a new worker needs no line here.
+# Finds the folder's sources, except main.cpp of the programs. A new worker therefore needs no line here.
 function(tonewerk_room_sources variable room)
   file(GLOB found CONFIGURE_DEPENDS ${PROJECT_SOURCE_DIR}/src/${room}/*.cpp)
   list(FILTER found EXCLUDE REGEX "/main\\.cpp$")
@@ -60,7 +60,7 @@ function(tonewerk_room room below libraries)
   set_property(GLOBAL APPEND PROPERTY TONEWERK_ROOMS ${room})
 endfunction()
 
-# All rooms of the table but those named, whose components are not there.
+# Makes all rooms of the table except the named ones, whose components are not available.
 function(tonewerk_rooms)
   set(table ${PROJECT_SOURCE_DIR}/src/rooms.txt)
   set_property(DIRECTORY ${PROJECT_SOURCE_DIR} APPEND PROPERTY CMAKE_CONFIGURE_DEPENDS ${table})
@@ -76,7 +76,7 @@ function(tonewerk_rooms)
   endforeach()
 endfunction()
 
-# tonewerk_group(NAME REGEX): what links all rooms whose path matches.
+# tonewerk_group(NAME REGEX): makes an interface target that links all rooms whose path matches.
 function(tonewerk_group name pattern)
   get_property(rooms GLOBAL PROPERTY TONEWERK_ROOMS)
   list(FILTER rooms INCLUDE REGEX "${pattern}")

@@ -1,13 +1,13 @@
-# Run while files are installed: what of them depends on the prefix. `cmake --install --prefix` and cpack choose that anew,
-# so nothing of it is known when the build is configured.
+# Runs while files are installed, for the files that depend on the prefix. `cmake --install --prefix` and cpack choose the prefix
+# then, so it is not known when the build is configured.
 cmake_minimum_required(VERSION 3.25)
 cmake_path(ABSOLUTE_PATH CMAKE_INSTALL_PREFIX NORMALIZE OUTPUT_VARIABLE prefix)
 
-# tonewerk_place(DESTINATION file...): as install(FILES) does, below the prefix, with the real prefix in the files where they
-# say @prefix@, or /usr/bin of our programs.
+# tonewerk_place(DESTINATION file...): installs files below the prefix, like install(FILES). In the files it replaces @prefix@,
+# and /usr/bin of the project's programs, by the real paths.
 function(tonewerk_place destination)
   cmake_path(ABSOLUTE_PATH destination BASE_DIRECTORY ${prefix} OUTPUT_VARIABLE directory)
-  # The configuration of what is below /usr is the system's; any other prefix keeps everything to itself.
+  # With the prefix /usr, configuration goes to /etc. With any other prefix, all files stay below the prefix.
   if(prefix STREQUAL "/usr" AND destination MATCHES "^etc/")
     set(directory /${destination})
   endif()
@@ -23,7 +23,7 @@ function(tonewerk_place destination)
   endforeach()
 endfunction()
 
-# tonewerk_leave_to_the_system(program...): below /usr, where the system finds libraries by itself, no program says where they are.
+# tonewerk_leave_to_the_system(program...): removes the run path of the programs below /usr, where the system finds the libraries.
 function(tonewerk_leave_to_the_system)
   if(prefix STREQUAL "/usr")
     foreach(program IN LISTS ARGN)

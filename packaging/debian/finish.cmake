@@ -1,5 +1,5 @@
-# What Debian wants in a package besides what is installed: its documents, compressed manuals, no sections that only
-# compilers and debuggers read. cpack runs this over the trees of all components before it packs them.
+# Adds what Debian requires in a package: its documents, compressed manuals, and no sections that only compilers and debuggers
+# read. cpack runs this on the trees of all components before it packs them.
 foreach(component IN LISTS CPACK_COMPONENTS_ALL)
   string(TOUPPER ${component} name)
   set(tree ${CPACK_TEMPORARY_DIRECTORY}/${component})
@@ -30,6 +30,6 @@ foreach(component IN LISTS CPACK_COMPONENTS_ALL)
       COMMAND_ERROR_IS_FATAL ANY)
   endif()
 
-  # Whatever the umask was.
+  # Does not depend on the umask.
   execute_process(COMMAND chmod -R u=rwX,go=rX ${tree} COMMAND_ERROR_IS_FATAL ANY)
 endforeach()

@@ -1,4 +1,5 @@
-# Debian packages, one a component: `cpack -G DEB` in a build directory whose prefix is /usr; scripts/package does it all.
+# Debian packages, one for each component: `cpack -G DEB` in a build directory whose prefix is /usr. scripts/package does all
+# steps.
 set(CPACK_GENERATOR DEB)
 set(CPACK_DEB_COMPONENT_INSTALL ON)
 set(CPACK_COMPONENTS_ALL daemon tools development library)
@@ -40,7 +41,7 @@ set(CPACK_DEBIAN_DAEMON_PACKAGE_CONTROL_EXTRA
   ${CMAKE_CURRENT_LIST_DIR}/daemon/postinst ${CMAKE_CURRENT_LIST_DIR}/daemon/prerm ${CMAKE_CURRENT_LIST_DIR}/daemon/postrm
   ${CMAKE_CURRENT_BINARY_DIR}/conffiles ${CMAKE_CURRENT_BINARY_DIR}/triggers)
 
-# What dpkg keeps when somebody has changed it.
+# Configuration files: dpkg keeps them when the user has changed them.
 file(GLOB preferences CONFIGURE_DEPENDS RELATIVE ${CMAKE_CURRENT_SOURCE_DIR} ${CMAKE_CURRENT_SOURCE_DIR}/etc/preferences/*)
 set(conffiles "/etc/apparmor.d/usr.bin.twreportingd\n/etc/tonewerk/device-facts.toml\n")
 foreach(file IN LISTS preferences)
@@ -48,7 +49,7 @@ foreach(file IN LISTS preferences)
   string(APPEND conffiles "${file}\n")
 endforeach()
 file(CONFIGURE OUTPUT ${CMAKE_CURRENT_BINARY_DIR}/conffiles CONTENT "${conffiles}" @ONLY)
-# For both libraries: the clients', and the one that programs with signposts load.
+# For both libraries: the client library, and the one that programs with signposts load.
 file(CONFIGURE OUTPUT ${CMAKE_CURRENT_BINARY_DIR}/triggers CONTENT "activate-noawait ldconfig\n" @ONLY)
 
 set(CPACK_DEBIAN_LIBRARY_PACKAGE_NAME libtwreporting0)
@@ -73,7 +74,7 @@ set(CPACK_COMPONENT_TOOLS_DESCRIPTION "tools for the reporting daemon of an audi
 twctl queries what the reporting daemon has recorded, talks to it as its
 clients do, and replays recordings. tw-pipewire reports what a PipeWire graph
 plays.")
-# Made here, so that no package says yet who has the library.
+# The library is built here, so no installed package provides it yet.
 set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS_PRIVATE_DIRS ${PROJECT_BINARY_DIR}/src)
 set(CPACK_DEBIAN_TOOLS_PACKAGE_DEPENDS "libtwreporting0 ${same_version}")
 set(CPACK_DEBIAN_TOOLS_PACKAGE_RECOMMENDS "tonewerk-reporting-daemon")
