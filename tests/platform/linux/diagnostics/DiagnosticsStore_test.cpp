@@ -2,12 +2,10 @@
 #include "platform/linux/diagnostics/DiagnosticsStore.h"
 
 #include <atomic>
-#include <condition_variable>
 #include <filesystem>
 #include <fstream>
 #include <future>
 #include <gmock/gmock.h>
-#include <mutex>
 #include <optional>
 #include <sstream>
 
@@ -18,6 +16,7 @@
 #include "support/memory/MemoryLog.h"
 #include "support/memory/MemoryPreferenceStore.h"
 #include "support/memory/SmallFileSystem.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 namespace {
@@ -47,31 +46,34 @@ class HeldCollector final : public DiagnosticCollector {
  public:
   std::string_view fileName() const override { return "held.txt"; }
   Result collect() override {
-    std::unique_lock lock(mutex_);
+    MutexLock lock(mutex_);
     ++entered_;
-    changed_.notify_all();
-    changed_.wait(lock, [this] { return isLetGo_; });
+    changed_.notifyAll();
+    while (!isReleased_) changed_.wait(lock);
     return {"late", ""};
   }
   bool waitUntilEntered(int times = 1) {
-    std::unique_lock lock(mutex_);
-    return changed_.wait_for(lock, kGenerous, [&] { return entered_ >= times; });
+    const auto end = std::chrono::steady_clock::now() + kGenerous;
+    MutexLock lock(mutex_);
+    while (entered_ < times && changed_.waitUntil(lock, end)) {
+    }
+    return entered_ >= times;
   }
   void release() {
-    const std::lock_guard lock(mutex_);
-    isLetGo_ = true;
-    changed_.notify_all();
+    const MutexLock lock(mutex_);
+    isReleased_ = true;
+    changed_.notifyAll();
   }
   int entered() {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     return entered_;
   }
 
  private:
-  std::mutex mutex_;
-  std::condition_variable changed_;
-  bool isLetGo_ = false;
-  int entered_ = 0;
+  Mutex mutex_;
+  Condition changed_;
+  bool isReleased_ GUARDED_BY(mutex_) = false;
+  int entered_ GUARDED_BY(mutex_) = 0;
 };
 
 struct Answer {

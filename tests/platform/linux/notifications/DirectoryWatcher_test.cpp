@@ -3,13 +3,11 @@
 
 #include <algorithm>
 #include <chrono>
-#include <condition_variable>
 #include <filesystem>
 #include <fstream>
 #include <functional>
 #include <gmock/gmock.h>
 #include <memory>
-#include <mutex>
 #include <string>
 #include <unistd.h>
 #include <vector>
@@ -17,6 +15,7 @@
 #include "support/OtherUser.h"
 #include "support/TemporaryDirectory.h"
 #include "support/memory/MemoryLog.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 namespace {
@@ -40,23 +39,26 @@ class DirectoryWatcherTest : public ::testing::Test {
 
   void report(const std::string& what) {
     {
-      std::unique_lock lock(mutex);
+      MutexLock lock(mutex);
       reports.push_back(what);
       all.push_back(what);
-      isHeld.wait(lock, [this] { return !mustHold; });
+      while (mustHold) isHeld.wait(lock);
     }
-    changed.notify_all();
+    changed.notifyAll();
   }
   // Waits until the watcher has reported this, and drops all reports up to it.
   bool waitFor(const std::string& what, std::chrono::milliseconds timeout = kTimeout) {
-    std::unique_lock lock(mutex);
-    return changed.wait_for(lock, timeout, [&] {
-      const auto found = std::find(reports.begin(), reports.end(), what);
-      if (found == reports.end()) return false;
-      before.assign(reports.begin(), found);
-      reports.erase(reports.begin(), found + 1);
-      return true;
-    });
+    const auto end = std::chrono::steady_clock::now() + timeout;
+    MutexLock lock(mutex);
+    auto found = std::find(reports.begin(), reports.end(), what);
+    while (found == reports.end() && changed.waitUntil(lock, end)) {
+      found = std::find(reports.begin(), reports.end(), what);
+    }
+    found = std::find(reports.begin(), reports.end(), what);  // once more after a timeout
+    if (found == reports.end()) return false;
+    before.assign(reports.begin(), found);
+    reports.erase(reports.begin(), found + 1);
+    return true;
   }
   // Makes a file name that is used only once.
   std::string newMarkerName() { return "witness" + std::to_string(++markers); }
@@ -70,21 +72,21 @@ class DirectoryWatcherTest : public ::testing::Test {
   // Keeps the watcher in its handler, so that the kernel queues all events until release().
   void hold() {
     {
-      const std::lock_guard lock(mutex);
+      const MutexLock lock(mutex);
       mustHold = true;
     }
     write(path("gate"));
   }
   void release() {
     {
-      const std::lock_guard lock(mutex);
+      const MutexLock lock(mutex);
       mustHold = false;
     }
-    isHeld.notify_all();
+    isHeld.notifyAll();
     EXPECT_TRUE(waitFor("gate"));
   }
   bool wasEverReported(const std::string& what) {
-    const std::lock_guard lock(mutex);
+    const MutexLock lock(mutex);
     return std::find(all.begin(), all.end(), what) != all.end();
   }
   // Whether files are reported again. The first one may be part of a report of everything.
@@ -102,13 +104,13 @@ class DirectoryWatcherTest : public ::testing::Test {
   std::string watched = parent + "/watched";
   MemoryLog log;
   LogCategory category{log, "com.orvane.tonewerk", "twrs"};
-  std::mutex mutex;
-  std::condition_variable changed;
-  std::condition_variable isHeld;
-  std::vector<std::string> reports;  // under the mutex, as the next two
-  std::vector<std::string> all;      // all reports, never dropped
-  bool mustHold = false;             // keeps the watcher in its handler
-  std::vector<std::string> before;   // the reports that waitFor() dropped
+  Mutex mutex;
+  Condition changed;
+  Condition isHeld;
+  std::vector<std::string> reports GUARDED_BY(mutex);
+  std::vector<std::string> all GUARDED_BY(mutex);  // all reports, never dropped
+  bool mustHold GUARDED_BY(mutex) = false;         // keeps the watcher in its handler
+  std::vector<std::string> before;                 // the reports that waitFor() dropped
   int markers = 0;
   std::unique_ptr<DirectoryWatcher> watcher;
 };

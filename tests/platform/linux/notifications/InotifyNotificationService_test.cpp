@@ -12,6 +12,7 @@
 #include "platform/linux/threads/ThreadQueue.h"
 #include "support/TemporaryDirectory.h"
 #include "support/memory/MemoryLog.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 namespace {
@@ -27,21 +28,24 @@ class InotifyNotificationServiceTest : public ::testing::Test {
   Token registerName(const std::string& name) {
     const auto registration = service.registerHandler(name, queue, [this](Token token) {
       {
-        const std::lock_guard lock(mutex);
+        const MutexLock lock(mutex);
         ++calls[token];
       }
-      changed.notify_all();
+      changed.notifyAll();
     });
     EXPECT_EQ(registration.status, NotificationService::kStatusOk);
     return registration.token;
   }
   int count(Token token) {
-    const std::lock_guard lock(mutex);
+    const MutexLock lock(mutex);
     return calls[token];
   }
   bool waitForMoreThan(int before, Token token) {
-    std::unique_lock lock(mutex);
-    return changed.wait_for(lock, std::chrono::seconds(20), [&] { return calls[token] > before; });
+    const auto end = std::chrono::steady_clock::now() + std::chrono::seconds(20);
+    MutexLock lock(mutex);
+    while (calls[token] <= before && changed.waitUntil(lock, end)) {
+    }
+    return calls[token] > before;
   }
   std::string file(const std::string& name = kName) const { return notifications + "/" + name; }
 
@@ -49,9 +53,9 @@ class InotifyNotificationServiceTest : public ::testing::Test {
   const std::string notifications = directory.path("runtime/notifications");
   MemoryLog log;
   LogCategory category{log, "com.orvane.tonewerk", "twrs"};
-  std::mutex mutex;
-  std::condition_variable changed;
-  std::map<Token, int> calls;  // under the mutex
+  Mutex mutex;
+  Condition changed;
+  std::map<Token, int> calls GUARDED_BY(mutex);
   ThreadQueue queue{"test", QueuePriority::kUtility};
   InotifyNotificationService service{notifications, category};
 };
@@ -125,12 +129,12 @@ TEST(InotifyNotificationServiceWithoutDirectoryTest, WorksAfterTheDirectoryIsCre
   ThreadQueue queue("test", QueuePriority::kUtility);
   std::mutex mutex;
   std::condition_variable changed;
-  bool isTold = false;
+  bool isCalled = false;
   InotifyNotificationService service(directory.path("runtime/notifications"), category);
   const auto registration = service.registerHandler(kName, queue, [&](Token) {
     {
       const std::lock_guard lock(mutex);
-      isTold = true;
+      isCalled = true;
     }
     changed.notify_all();
   });
@@ -141,7 +145,7 @@ TEST(InotifyNotificationServiceWithoutDirectoryTest, WorksAfterTheDirectoryIsCre
   EXPECT_FALSE(service.post(kName));
   EXPECT_EQ(service.state(registration.token), 0U);
   std::unique_lock lock(mutex);
-  EXPECT_TRUE(changed.wait_for(lock, std::chrono::seconds(20), [&] { return isTold; }));
+  EXPECT_TRUE(changed.wait_for(lock, std::chrono::seconds(20), [&] { return isCalled; }));
 }
 
 }  // namespace

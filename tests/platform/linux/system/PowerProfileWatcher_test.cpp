@@ -5,10 +5,10 @@
 #include <chrono>
 #include <deque>
 #include <gtest/gtest.h>
-#include <mutex>
 #include <systemd/sd-bus.h>
 
 #include "platform/linux/dbus/PrivateBus.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 namespace {
@@ -63,11 +63,11 @@ class FakeService {
 class Reports {
  public:
   void add(bool isPowerSaver) {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     reports_.push_back(isPowerSaver);
   }
   std::optional<bool> take() {
-    const std::lock_guard lock(mutex_);
+    const MutexLock lock(mutex_);
     if (reports_.empty()) return std::nullopt;
     const bool first = reports_.front();
     reports_.pop_front();
@@ -75,8 +75,8 @@ class Reports {
   }
 
  private:
-  std::mutex mutex_;
-  std::deque<bool> reports_;  // guarded by mutex_
+  Mutex mutex_;
+  std::deque<bool> reports_ GUARDED_BY(mutex_);
 };
 
 class PowerProfileWatcherTest : public testing::Test {
