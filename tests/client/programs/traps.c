@@ -25,7 +25,7 @@ static void notice(const char* function) {
   if (has_traps) atomic_compare_exchange_strong(&first_function, &none, function);
 }
 
-/* ---- allocation: the C library has second names for its functions. operator new and delete call these. ---- */
+/* ---- allocation: the C library has second names for its functions. new and delete call these. ---- */
 
 extern void* __libc_malloc(size_t size);
 extern void* __libc_calloc(size_t count, size_t size);

@@ -25,7 +25,7 @@ int traps_forbid_system_calls(void);
 void traps_begin(void);
 void traps_end(void);
 
-/* Ends the calling thread, which may be joined. Its objects stay, because destroying them takes system calls. */
+/* Ends the calling thread, which may be joined. Its objects stay: destroying them takes system calls. */
 void traps_exit(void);
 
 /* The first function that a thread called within its traps; NULL for none. */
