@@ -19,7 +19,7 @@
 
 #include "PublishedDrivers.h"
 #include "driver/TWReportingDriverUtility.h"
-#include "platform/LogCategory.h"
+#include "platform/Log.h"
 #include "platform/linux/LinuxPlatform.h"
 #include "platform/linux/channels/LinuxChanmeter.h"
 #include "platform/linux/directories/Directories.h"
