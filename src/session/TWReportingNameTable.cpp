@@ -41,17 +41,16 @@ const SharedString& TWReportingNameTable::audioTag(AudioEventCategory category, 
   return tag;
 }
 
-const TWReportingNameTable::EventNames& TWReportingNameTable::eventNames(AudioEventCategory category,
-                                                                         AudioEventType type,
-                                                                         AudioServiceType service) {
+const EventNames& TWReportingNameTable::eventNames(AudioEventCategory category, AudioEventType type,
+                                                   AudioServiceType service) {
   const std::size_t servicePlace = service < kServicePlaces - 1 ? service : kServicePlaces - 1;
   const auto [names, isNew] =
       eventNames_.try_emplace(placeOf(category, type) * kServicePlaces + servicePlace);
   if (isNew) {
     const std::string ending =
         "." + TWReportingUtilityCategoryString(category) + "." + TWReportingUtilityTypeString(type);
-    names->second.ofTonewerk = "com.orvane.tonewerk" + ending;
-    names->second.ofService =
+    names->second.first = "com.orvane.tonewerk" + ending;
+    names->second.second =
         "com.orvane." + TWReportingUtilityGenerateServiceNameFromServiceType(service) + ending;
   }
   return names->second;

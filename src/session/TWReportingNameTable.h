@@ -5,6 +5,7 @@
 #include <unordered_map>
 #include <vector>
 
+#include "platform/Metricon.h"
 #include "protocol/AudioEvent.h"
 #include "values/SharedString.h"
 
@@ -21,11 +22,7 @@ class TWReportingNameTable {
   // The category's text followed by the type's, such as "PlaybackStart".
   const SharedString& audioTag(AudioEventCategory category, AudioEventType type);
 
-  // "com.orvane.tonewerk.<category>.<type>" and "com.orvane.<service>.<category>.<type>".
-  struct EventNames {
-    SharedString ofTonewerk;
-    SharedString ofService;
-  };
+  // "com.orvane.tonewerk.<category>.<type>", then "com.orvane.<service>.<category>.<type>".
   const EventNames& eventNames(AudioEventCategory category, AudioEventType type, AudioServiceType service);
 
  private:

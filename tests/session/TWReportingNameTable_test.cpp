@@ -14,8 +14,8 @@ TEST(TWReportingNameTableTest, ComposesTheNamesOnce) {
   TWReportingNameTable table;
   EXPECT_EQ(table.audioTag(4, 1), "PlaybackStart");
   EXPECT_TRUE(table.audioTag(4, 1).sharesStorageWith(table.audioTag(4, 1)));
-  EXPECT_EQ(table.eventNames(4, 2, 2).ofTonewerk, "com.orvane.tonewerk.Playback.Stop");
-  EXPECT_EQ(table.eventNames(4, 2, 2).ofService, "com.orvane.telephony.Playback.Stop");
+  EXPECT_EQ(table.eventNames(4, 2, 2).first, "com.orvane.tonewerk.Playback.Stop");
+  EXPECT_EQ(table.eventNames(4, 2, 2).second, "com.orvane.telephony.Playback.Stop");
   EXPECT_EQ(&table.eventNames(4, 2, 2), &table.eventNames(4, 2, 2));
 }
 
@@ -40,8 +40,8 @@ RC_GTEST_PROP(TWReportingNameTableProperty, GivesEveryCategoryTypeAndServiceItsO
     ending += c;
     ending += '.';
     ending += t;
-    RC_ASSERT(names.ofTonewerk.string() == "com.orvane.tonewerk" + ending);
-    RC_ASSERT(names.ofService.string() == "com.orvane." + s + ending);
+    RC_ASSERT(names.first.string() == "com.orvane.tonewerk" + ending);
+    RC_ASSERT(names.second.string() == "com.orvane." + s + ending);
   }
 }
 
