@@ -23,6 +23,7 @@
 #include "platform/linux/diagnostics/DiagnosticsStore.h"
 #include "platform/linux/diagnostics/LinuxCapsa.h"
 #include "platform/linux/directories/Directories.h"
+#include "platform/linux/directories/SocketPaths.h"
 #include "platform/linux/messaging/AllocatorReclaimer.h"
 #include "platform/linux/notifications/DirectoryWatcher.h"
 #include "platform/linux/otlp/CurlHttpClient.h"
@@ -265,7 +266,7 @@ int run() {
   LinuxPlatform linux(directories);
   const LogCategory log(linux.log(), "com.orvane.tonewerk", "twrs");
   std::string problem;
-  auto socket = ServerSocket::open(directories.runtime + "/reporting.sock", problem);
+  auto socket = ServerSocket::open(socketPathOf(directories), problem);
   if (socket == nullptr) {
     errorLog(log, "cannot listen: %@", problem);
     return kFailure;

@@ -3,11 +3,13 @@
 
 #include <algorithm>
 #include <cstdlib>
+#include <optional>
+#include <string>
 #include <unistd.h>
 #include <unordered_map>
 #include <utility>
 
-#include "platform/linux/directories/Directories.h"
+#include "platform/linux/directories/SocketPaths.h"
 #include "platform/linux/messagepack/RpcLimits.h"
 #include "platform/linux/messagepack/RpcWriter.h"
 #include "support/client/RpcClientSocket.h"
@@ -16,9 +18,6 @@ namespace tonewerk {
 namespace {
 
 using std::chrono::milliseconds;
-
-constexpr const char* kSocketVariable = "TONEWERK_REPORTING_SOCKET";
-constexpr const char* kSocketName = "/reporting.sock";
 
 ReplyError errorOf(const Value& value) {
   const ValueMap* map = value.asMap();
@@ -55,11 +54,11 @@ ReportingClient::ReportingClient() = default;
 ReportingClient::~ReportingClient() = default;
 
 std::vector<std::string> ReportingClient::socketPaths() {
-  if (const char* chosen = std::getenv(kSocketVariable); chosen != nullptr && *chosen != '\0')
-    return {chosen};
-  const std::string own = Directories::fromEnvironment().runtime + kSocketName;
-  const std::string system = Directories::system().runtime + kSocketName;
-  return own == system ? std::vector{system} : std::vector{own, system};
+  const auto variable = [](const std::string& name) -> std::optional<std::string> {
+    const char* value = std::getenv(name.c_str());
+    return value == nullptr ? std::nullopt : std::optional<std::string>(value);
+  };
+  return socketPathsFrom(variable, ::geteuid());
 }
 
 std::error_code ReportingClient::connect(const std::vector<std::string>& paths) {
