@@ -69,7 +69,7 @@ class ValuePayload {
   ValuePayload() : memory_(kFirstBytes) {}
 
   // Builds a message or a configuration. Fails as the C interface does; the payload must then not be sent.
-  twr_status set(const ValueMap& map) {
+  [[nodiscard]] twr_status set(const ValueMap& map) {
     return fill([&] {
       twr_payload_init(&payload_, memory_.data(), memory_.size());
       return putEntries(&payload_, map);
@@ -77,7 +77,7 @@ class ValuePayload {
   }
 
   // Builds a request's parameters.
-  twr_status set(const Arguments& arguments) {
+  [[nodiscard]] twr_status set(const Arguments& arguments) {
     return fill([&] {
       twr_payload_init_list(&payload_, memory_.data(), memory_.size());
       for (const Argument& argument : arguments) {

@@ -90,13 +90,14 @@ void DaemonLink::create(std::int64_t reporterID) {
 
 void DaemonLink::configure(std::int64_t reporterID, std::uint16_t serviceType,
                            const ValueMap& configuration) {
-  ValuePayload payload;
-  payload.set(configuration);
   // The service type goes first: changing it in a configured session would make the daemon replace the
   // session.
   request("setServiceType", [&](twr_reply reply, void* context) {
     return twr_session_set_service_type(session(reporterID), serviceType, reply, context);
   });
+  ValuePayload payload;
+  if (payload.set(configuration) != TWR_OK)
+    return console_.say("the configuration of a session is too large");
   request("setConfiguration", [&](twr_reply reply, void* context) {
     return twr_session_set_configuration(session(reporterID), payload.get(), reply, context);
   });
@@ -114,7 +115,7 @@ void DaemonLink::message(std::int64_t reporterID, std::uint32_t category, std::u
     console_.detail("session " + std::to_string(reporterID) + ": " + message.text());
   }
   ValuePayload payload;
-  payload.set(message);
+  if (payload.set(message) != TWR_OK) return console_.say("a message is too large, and is not sent");
   request("sendMessage", [&](twr_reply reply, void* context) {
     return twr_session_send(session(reporterID), category, type, payload.get(), reply, context);
   });
