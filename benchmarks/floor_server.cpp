@@ -85,7 +85,7 @@ FileDescriptor listenAt(const std::string& path) {
 
 void serve(const FileDescriptor& listener) {
   Epoll epoll;
-  epoll.add(listener.get(), kListener, EPOLLIN);
+  if (!epoll.add(listener.get(), kListener, EPOLLIN)) return;
   std::unordered_map<std::uint64_t, std::unique_ptr<Connection>> connections;
   std::uint64_t next = kListener + 1;
   for (;;) {
@@ -94,7 +94,8 @@ void serve(const FileDescriptor& listener) {
         FileDescriptor socket(::accept4(listener.get(), nullptr, nullptr, SOCK_CLOEXEC | SOCK_NONBLOCK));
         if (!socket) continue;
         auto connection = std::make_unique<Connection>(std::move(socket));
-        epoll.add(connection->fileDescriptor(), next, EPOLLIN);
+        if (!epoll.add(connection->fileDescriptor(), next, EPOLLIN))
+          continue;  // its client sees an end of file
         connections.emplace(next++, std::move(connection));
       } else if (!connections.at(event.identifier)->handleReadable()) {
         connections.erase(event.identifier);  // closing the socket removes it from the epoll

@@ -22,10 +22,10 @@ class Epoll {
 
   Epoll() : descriptor_(::epoll_create1(EPOLL_CLOEXEC)) {}
 
-  bool add(int descriptor, std::uint64_t identifier, std::uint32_t events) {
+  [[nodiscard]] bool add(int descriptor, std::uint64_t identifier, std::uint32_t events) {
     return control(EPOLL_CTL_ADD, descriptor, identifier, events);
   }
-  bool change(int descriptor, std::uint64_t identifier, std::uint32_t events) {
+  [[nodiscard]] bool change(int descriptor, std::uint64_t identifier, std::uint32_t events) {
     return control(EPOLL_CTL_MOD, descriptor, identifier, events);
   }
   // Does nothing for a descriptor that was not added.

@@ -15,7 +15,7 @@ namespace tonewerk {
 class WakeEvent {
  public:
   // False when the system has no descriptor left.
-  bool open() {
+  [[nodiscard]] bool open() {
     event_.reset(::eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK));
     return static_cast<bool>(event_);
   }

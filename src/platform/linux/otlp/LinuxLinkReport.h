@@ -53,7 +53,7 @@ class LinuxLinkReport final : public LinkReport {
       const ValueMap& sessionInfo, const ValueMap& userInfo, const ValueArray* frameworksToCheck) override;
 
   // Sends all waiting records within `timeout`. Nothing is sent after that. False if records are left.
-  bool finish(std::chrono::milliseconds timeout);
+  [[nodiscard]] bool finish(std::chrono::milliseconds timeout);
 
  private:
   class Session;
