@@ -71,7 +71,7 @@ StrandPool::~StrandPool() {
   }
 }
 
-std::shared_ptr<Strand> StrandPool::makeQueue() { return std::make_shared<Strand>(shared_); }
+std::shared_ptr<Strand> StrandPool::makeStrand() { return std::make_shared<Strand>(shared_); }
 
 void StrandPool::drain() { thread_->drain(); }
 

@@ -35,7 +35,7 @@ class StrandPool {
   ~StrandPool();
 
   // Any thread.
-  std::shared_ptr<Strand> makeQueue();
+  std::shared_ptr<Strand> makeStrand();
 
   // Returns when every piece submitted before has run or is held.
   void drain();
@@ -78,6 +78,9 @@ class Strand : public std::enable_shared_from_this<Strand> {
   // On the pool's thread. Returns how many pieces were dropped since the last call because they did not fit.
   std::uint64_t takeDroppedCount();
 
+  // True on the pool's thread, and on any thread once the pool is gone. For assertions.
+  bool ownsThisThread() const;
+
  private:
   friend class StrandPool;
   struct Piece {
@@ -85,8 +88,6 @@ class Strand : public std::enable_shared_from_this<Strand> {
     Task work;
   };
 
-  // True on the pool's thread, and on any thread once the pool is gone. For assertions.
-  bool ownsThisThread() const;
   void runOrHold(std::size_t bytes, Task work);
   std::deque<Piece> takeHeld();
 

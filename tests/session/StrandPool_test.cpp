@@ -18,7 +18,7 @@ class StrandPoolTest : public ::testing::Test {
     auto owned = std::make_unique<ManualSerialQueue>("thread");
     thread = owned.get();
     pool.emplace(std::move(owned));
-    strand = pool->makeQueue();
+    strand = pool->makeStrand();
   }
 
   void submit(Strand& to, const std::string& text, std::size_t bytes = 0) {
@@ -35,7 +35,7 @@ class StrandPoolTest : public ::testing::Test {
 };
 
 TEST_F(StrandPoolTest, RunsPiecesInTheOrderOfSubmission) {
-  const auto other = pool->makeQueue();
+  const auto other = pool->makeStrand();
   submit(*strand, "a");
   submit(*other, "b");
   submit(*strand, "c");
@@ -61,7 +61,7 @@ TEST_F(StrandPoolTest, HoldsThePiecesBehindAHoldUntilReleased) {
 }
 
 TEST_F(StrandPoolTest, AHeldStrandDoesNotDelayOthers) {
-  const auto other = pool->makeQueue();
+  const auto other = pool->makeStrand();
   submitHolding(*strand);
   submit(*strand, "a");
   submit(*other, "b");
@@ -109,7 +109,7 @@ TEST_F(StrandPoolTest, DropsAndCountsPiecesThatDoNotFitWhileHeld) {
 }
 
 TEST_F(StrandPoolTest, TheRoomIsSharedAndIsFreedWhenAStrandEnds) {
-  auto other = pool->makeQueue();
+  auto other = pool->makeStrand();
   submitHolding(*other);
   submit(*other, "x", kMax - 1024);
   submitHolding(*strand);
@@ -133,7 +133,7 @@ TEST_F(StrandPoolTest, EmptyPiecesTakeRoomToo) {
 }
 
 TEST_F(StrandPoolTest, TheDestructorRunsQueuedPiecesAndDropsHeldOnes) {
-  const auto other = pool->makeQueue();
+  const auto other = pool->makeStrand();
   const auto kept = std::make_shared<int>(0);
   submitHolding(*strand);
   strand->submit(0, [kept, self = strand] {});  // refers to its own strand, as a worker's pieces do

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "workers/sinks/RtcReporter.h"
 
+#include <cassert>
 #include <string_view>
 #include <utility>
 
@@ -28,6 +29,7 @@ RtcReporter::RtcReporter(std::shared_ptr<Strand> queue) : queue_(std::move(queue
 RtcReporter::~RtcReporter() = default;
 
 void RtcReporter::start(const Start& start) {
+  assert(queue_->ownsThisThread());
   debugLog(TWReportingSessionLinkReportCategory(), "entering linkreport %s", "start");
   LinkReport& service = TWReportingContext::current().platform().linkReport;
   linkReportAgentToken_ = service.newHierarchyTokenFromParentToken(std::nullopt);
@@ -132,6 +134,7 @@ void RtcReporter::resume() {
 }
 
 void RtcReporter::handleMessage(TWReportingSessionMessage& message) {
+  assert(queue_->ownsThisThread());
   if (!linkReportSessionStarted_) {
     defaultLog(TWReportingSessionLinkReportCategory(), "Session never started. %s", "handleMessage");
     return;
@@ -156,6 +159,7 @@ void RtcReporter::sendMessage(TWReportingSessionMessage& message) {
 
 void RtcReporter::sendSummary(const TWReportingSessionMessages& messages, AudioServiceType serviceType,
                               ReporterID reporterID) {
+  assert(queue_->ownsThisThread());
   if (!linkReportSessionStarted_ || messages.empty()) return;
   TWReportingSessionMessage summary(
       rtcSummaryOf(messages, serviceType, TWReportingSessionRtcWorker::kWorkerClass), kCategoryUnknown,
@@ -170,6 +174,7 @@ void RtcReporter::sendSummary(const TWReportingSessionMessages& messages, AudioS
 }
 
 void RtcReporter::stop() {
+  assert(queue_->ownsThisThread());
   if (!linkReportSessionStarted_) {
     defaultLog(TWReportingSessionLinkReportCategory(), "Session never started. %s", "stop");
     return;

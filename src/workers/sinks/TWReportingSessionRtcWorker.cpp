@@ -35,7 +35,7 @@ std::uint16_t TWReportingSessionRtcWorker::retrieveLinkReportCategoryFromCategor
 
 void TWReportingSessionRtcWorker::makeQueueOnFirstUse() {
   if (linkReportQueue_ != nullptr) return;
-  linkReportQueue_ = TWReportingContext::current().linkReportQueues().makeQueue();
+  linkReportQueue_ = TWReportingContext::current().linkReportQueues().makeStrand();
   reporter_ = std::make_shared<RtcReporter>(linkReportQueue_);
 }
 

@@ -391,7 +391,7 @@ TEST_F(TWReportingSessionRtcWorkerTest, MessagesForOtherWorkersAreInTheSummaryOn
 
 TEST_F(TWReportingSessionRtcWorkerTest, AStopWithoutMessagesSendsNoSummaryButFlushesAndEnds) {
   // A session always holds its start and stop messages, so the test calls the reporter directly.
-  const auto queue = context->linkReportQueues().makeQueue();
+  const auto queue = context->linkReportQueues().makeStrand();
   const auto reporter = std::make_shared<RtcReporter>(queue);
   queue->submit(0, [&] {
     reporter->start({});

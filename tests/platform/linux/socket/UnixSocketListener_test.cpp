@@ -611,8 +611,8 @@ TEST_F(FewDescriptorsTest, PausesWhenTheSystemHasNoDescriptorAndLogsThatOnce) {
   UnixSocketListener listener(ServerSocket::open(path, problem), category);
   listener.setDelegate(delegate);
   listener.resume();
-  // One client connects and leaves first, and an error says its text: without descriptors the sanitizer cannot
-  // read an object's type, and reports types that it has not seen before.
+  // One client connects and leaves first, and an error says its text: without descriptors the sanitizer
+  // cannot read an object's type, and reports types that it has not seen before.
   EXPECT_FALSE(std::generic_category().message(EMFILE).empty());
   {
     RawClient early(path);
