@@ -28,10 +28,10 @@
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionMessage.h"
 #include "support/TemporaryDirectory.h"
-#include "support/memory/MemoryDiagwire.h"
-#include "support/memory/MemoryEnergybook.h"
-#include "support/memory/MemoryLinkReport.h"
-#include "support/memory/MemoryMetricon.h"
+#include "support/memory/reports/MemoryDiagwire.h"
+#include "support/memory/reports/MemoryEnergybook.h"
+#include "support/memory/reports/MemoryLinkReport.h"
+#include "support/memory/reports/MemoryMetricon.h"
 #include "workers/TWReportingWorkerClasses.h"
 
 namespace tonewerk {

@@ -14,10 +14,10 @@
 #include "platform/linux/directories/Directories.h"
 #include "platform/linux/tracing/UnavailableTracing.h"
 #include "support/TemporaryDirectory.h"
-#include "support/memory/MemoryDiagwire.h"
-#include "support/memory/MemoryEnergybook.h"
-#include "support/memory/MemoryLinkReport.h"
-#include "support/memory/MemoryMetricon.h"
+#include "support/memory/reports/MemoryDiagwire.h"
+#include "support/memory/reports/MemoryEnergybook.h"
+#include "support/memory/reports/MemoryLinkReport.h"
+#include "support/memory/reports/MemoryMetricon.h"
 
 namespace tonewerk {
 namespace {

@@ -12,10 +12,10 @@
 #include "support/TemporaryDirectory.h"
 #include "support/manual/ManualClock.h"
 #include "support/manual/ManualTimers.h"
-#include "support/memory/MemoryCapsa.h"
 #include "support/memory/MemoryJsonService.h"
 #include "support/memory/MemoryLog.h"
 #include "support/memory/MemoryPreferenceStore.h"
+#include "support/memory/reports/MemoryCapsa.h"
 
 namespace tonewerk {
 namespace {

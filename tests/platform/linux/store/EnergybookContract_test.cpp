@@ -11,10 +11,10 @@
 #include "platform/linux/store/StoreEnergybook.h"
 #include "support/TemporaryDirectory.h"
 #include "support/manual/ManualClock.h"
-#include "support/memory/MemoryEnergybook.h"
 #include "support/memory/MemoryJsonService.h"
 #include "support/memory/MemoryLog.h"
 #include "support/memory/MemoryPreferenceStore.h"
+#include "support/memory/reports/MemoryEnergybook.h"
 
 namespace tonewerk {
 namespace {

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/memory/MemoryBenchfile.h"
+#include "support/memory/reports/MemoryBenchfile.h"
 
 #include <utility>
 

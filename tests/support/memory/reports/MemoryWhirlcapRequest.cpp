@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/memory/MemoryWhirlcapRequest.h"
+#include "support/memory/reports/MemoryWhirlcapRequest.h"
 
 #include <utility>
 

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/memory/MemoryDiagwire.h"
+#include "support/memory/reports/MemoryDiagwire.h"
 
 #include <utility>
 

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/memory/MemoryEnergybook.h"
+#include "support/memory/reports/MemoryEnergybook.h"
 
 #include <utility>
 

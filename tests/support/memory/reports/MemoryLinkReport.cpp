@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/memory/MemoryLinkReport.h"
+#include "support/memory/reports/MemoryLinkReport.h"
 
 #include <utility>
 

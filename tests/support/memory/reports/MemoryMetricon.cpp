@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/memory/MemoryMetricon.h"
+#include "support/memory/reports/MemoryMetricon.h"
 
 #include <fnmatch.h>
 

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/memory/MemoryKolvi.h"
+#include "support/memory/reports/MemoryKolvi.h"
 
 #include "platform/Kolvi.h"
 

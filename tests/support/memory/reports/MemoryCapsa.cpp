@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/memory/MemoryCapsa.h"
+#include "support/memory/reports/MemoryCapsa.h"
 
 #include <utility>
 

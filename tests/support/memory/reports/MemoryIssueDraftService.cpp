@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/memory/MemoryIssueDraftService.h"
+#include "support/memory/reports/MemoryIssueDraftService.h"
 
 #include <utility>
 

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "support/memory/MemoryRuntrace.h"
+#include "support/memory/reports/MemoryRuntrace.h"
 
 #include <algorithm>
 #include <utility>
