@@ -103,16 +103,16 @@ TEST(ChannelDocumentationTest, HasASchemaThatAgreesWithTheReader) {
 TEST(ChannelDocumentationTest, NamesEveryFailureAndBound) {
   EXPECT_EQ(Chanmeter::kErrorNoEarlierSamples, 1);
   const std::pair<std::int64_t, const char*> failures[] = {
-      {Chanmeter::kErrorNoEarlierSamples, "against nothing"},
-      {kChannelsUnreadable, "no regular file"},
+      {Chanmeter::kErrorNoEarlierSamples, "no sample at the session's start"},
+      {kChannelsUnreadable, "not a regular file"},
       {kChannelsTooLarge, "larger than 1 MiB"},
-      {kChannelsNotJson, "no JSON"},
+      {kChannelsNotJson, "not JSON"},
       {kChannelsFieldMissing, "missing"},
       {kChannelsWrongType, "wrong type"},
       {kChannelsOutOfRange, "cannot hold"},
-      {kChannelsUnsettled, "whenever it was read"},
-      {kChannelsTooMany, "past a bound"},
-      {kChannelsNotUnderstood, "another form"},
+      {kChannelsUnsettled, "changed during every reading"},
+      {kChannelsTooMany, "above a limit"},
+      {kChannelsNotUnderstood, "unexpected form"},
   };
   for (const auto& [code, words] : failures) {
     const std::size_t row = page().find("\n| " + std::to_string(code) + " | ");
