@@ -198,6 +198,8 @@ void ClientEngine::abandon() {
 void ClientEngine::runThread(void* self) { static_cast<ClientEngine*>(self)->run(); }
 
 void ClientEngine::run() {
+  // A callback may fork, and the child may destroy the client there. Then this is the last reference.
+  const std::shared_ptr<void> alive = owner;
   const MutexLock lock(mutex_);
   nextAttempt_ = Clock::now();
   while (!isDone()) {
@@ -376,9 +378,9 @@ bool ClientEngine::decode(std::string_view bytes) {
 bool ClientEngine::deliver() {
   if (deliveries_.empty()) return false;
   const Deliveries deliveries = std::exchange(deliveries_, {});
+  const MutexUnlock unlocked(mutex_);
   for (const Delivery& delivery : deliveries) {
     if (delivery.state && isDetached_) continue;  // a callback before this one destroyed the client
-    const MutexUnlock unlocked(mutex_);
     if (delivery.state) {
       settings_.stateChanged(settings_.context, *delivery.state);
     } else {

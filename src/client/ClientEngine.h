@@ -96,7 +96,7 @@ class ClientEngine {
   // ---- for the registry ----
 
   // The registry's mutex guards these two. The owner is the object that this engine is a part of. It keeps
-  // itself alive through this pointer until the registry removes it.
+  // itself alive through this pointer until the registry removes it, and while the client's thread runs.
   ClientEngine* nextClient = nullptr;
   std::shared_ptr<void> owner;
   // A fork holds the mutexes of all clients at once. The analysis cannot follow one mutex for each object in
@@ -180,7 +180,8 @@ class ClientEngine {
 
   bool isEnding_ GUARDED_BY(mutex_) = false;
   bool isAbandoned_ GUARDED_BY(mutex_) = false;
-  bool isDetached_ GUARDED_BY(mutex_) = false;
+  // Set in a callback, and so on the client's thread, which reads it between callbacks without the mutex.
+  std::atomic<bool> isDetached_{false};
   bool hasFinished_ GUARDED_BY(mutex_) = false;
   bool isBeingJoined_ GUARDED_BY(mutex_) = false;
   Condition joined_;

@@ -43,13 +43,27 @@ bool isMapped(const std::string& library) {
   return false;
 }
 
+bool endedWell(pid_t child) {
+  int status = 0;
+  return ::waitpid(child, &status, 0) == child && WIFEXITED(status) && WEXITSTATUS(status) == 0;
+}
+
 // Runs `check` in a forked child. True when `check` was, and the child exited normally.
 bool isTrueInChild(const std::function<bool()>& check) {
   const pid_t child = ::fork();
   if (child == 0) ::_exit(check() ? 0 : 1);
-  int status = 0;
-  return ::waitpid(child, &status, 0) == child && WIFEXITED(status) && WEXITSTATUS(status) == 0;
+  return endedWell(child);
 }
+
+// Ends a child process when its thread has returned. A sanitizer would then look for leaks, and would not know
+// the memory of the threads that only the parent has.
+struct ChildThreadEnd {
+  bool isChild = false;
+  ~ChildThreadEnd() {
+    if (isChild) ::_exit(0);
+  }
+};
+thread_local ChildThreadEnd childThreadEnd;
 
 class ForkedClientTest : public ClientTest {};
 
@@ -174,6 +188,21 @@ TEST_F(ForkedClientTest, MayForkInsideACallback) {
   EXPECT_EQ(log.next(), "send: done");
   EXPECT_EQ(send(2), TWR_OK);
   EXPECT_EQ(connection->nextText(), message(2));
+}
+
+TEST_F(ForkedClientTest, MayBeDestroyedInAChildThatReturnsFromTheCallback) {
+  const auto connection = connectWithSession();
+  pid_t child = -1;
+  void* context = log.as("send", [&](const twr_answer&) {
+    child = ::fork();
+    if (child != 0) return;
+    childThreadEnd.isChild = true;
+    twr_client_destroy(client, 0);
+  });
+  ASSERT_EQ(send(1, AnswerLog::note, context), TWR_OK);
+  connection->answer(connection->next().identifier, std::nullopt);
+  EXPECT_EQ(log.next(), "send: done");
+  EXPECT_TRUE(endedWell(child));
 }
 
 // Loads libtwreporting as programs do.
