@@ -96,8 +96,8 @@ void DaemonLink::configure(std::int64_t reporterID, std::uint16_t serviceType,
     return twr_session_set_service_type(session(reporterID), serviceType, reply, context);
   });
   ValuePayload payload;
-  if (payload.set(configuration) != TWR_OK)
-    return console_.say("the configuration of a session is too large");
+  if (const twr_status status = payload.set(configuration); status != TWR_OK)
+    return reportUnsendable("setConfiguration", status);
   request("setConfiguration", [&](twr_reply reply, void* context) {
     return twr_session_set_configuration(session(reporterID), payload.get(), reply, context);
   });
@@ -115,7 +115,8 @@ void DaemonLink::message(std::int64_t reporterID, std::uint32_t category, std::u
     console_.detail("session " + std::to_string(reporterID) + ": " + message.text());
   }
   ValuePayload payload;
-  if (payload.set(message) != TWR_OK) return console_.say("a message is too large, and is not sent");
+  if (const twr_status status = payload.set(message); status != TWR_OK)
+    return reportUnsendable("sendMessage", status);
   request("sendMessage", [&](twr_reply reply, void* context) {
     return twr_session_send(session(reporterID), category, type, payload.get(), reply, context);
   });
@@ -144,6 +145,10 @@ twr_client_info DaemonLink::info() const {
 twr_session* DaemonLink::session(std::int64_t reporterID) const {
   const auto found = sessions_.find(reporterID);
   return found == sessions_.end() ? nullptr : found->second;
+}
+
+void DaemonLink::reportUnsendable(const char* method, twr_status status) const {
+  console_.say(std::string(method) + " was not sent: " + twr_status_text(status));
 }
 
 template <class Call>

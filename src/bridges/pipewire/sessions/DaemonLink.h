@@ -61,6 +61,7 @@ class DaemonLink final : public SessionSink {
 
   twr_client_info info() const;
   twr_session* session(std::int64_t reporterID) const;
+  void reportUnsendable(const char* method, twr_status status) const;
   // Runs `call`, which makes a request with the given reply function and context. The reply reports a
   // refusal.
   template <class Call>
