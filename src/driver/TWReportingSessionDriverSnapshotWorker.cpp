@@ -3,7 +3,6 @@
 
 #include <cassert>
 
-#include "platform/SerialQueue.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingUtility.h"
 

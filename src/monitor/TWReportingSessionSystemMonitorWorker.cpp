@@ -5,7 +5,6 @@
 #include <utility>
 
 #include "monitor/TWReportingSystemMonitor.h"
-#include "platform/SerialQueue.h"
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionMessage.h"

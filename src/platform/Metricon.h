@@ -13,7 +13,7 @@ namespace tonewerk {
 // What one event is called: one name, or two where a framework and a service each have a name for it.
 struct EventNames {
   EventNames() = default;
-  // Implicit, because most events have one name.
+  // Implicit: a text is the name of an event that has one.
   template <std::convertible_to<SharedString> Name>
   EventNames(const Name& name) : first(name) {}
   EventNames(SharedString firstName, SharedString secondName)

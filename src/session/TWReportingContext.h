@@ -69,7 +69,7 @@ class TWReportingContext {
   const TWReportingSessionWorkerRegistry& workerRegistry();
 
   // The process-wide objects of the rooms above session/. They end after the context's queues.
-  SingletonRegistry& singletons() { return singles_; }
+  SingletonRegistry& singletons() { return singletons_; }
 
   // On the work queue.
   TWReportingNameTable& names() {
@@ -101,7 +101,7 @@ class TWReportingContext {
  private:
   const Platform platform_;
   TWReportingNameTable names_;
-  SingletonRegistry singles_;
+  SingletonRegistry singletons_;
 
   std::once_flag internalBuildOnce_;
   bool isInternalBuild_ = false;

@@ -5,7 +5,6 @@
 #include <string>
 #include <string_view>
 
-#include "platform/SerialQueue.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionMessage.h"

@@ -10,7 +10,6 @@
 #include "platform/Clock.h"
 #include "platform/DeviceFacts.h"
 #include "platform/Log.h"
-#include "platform/SerialQueue.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionMessage.h"

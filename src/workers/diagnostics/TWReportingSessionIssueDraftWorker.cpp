@@ -8,7 +8,6 @@
 
 #include "platform/Clock.h"
 #include "platform/Log.h"
-#include "platform/SerialQueue.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingDefaults.h"
 #include "session/TWReportingSession.h"

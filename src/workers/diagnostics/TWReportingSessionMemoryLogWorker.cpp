@@ -11,7 +11,6 @@
 
 #include "platform/DetachedThreads.h"
 #include "platform/Log.h"
-#include "platform/SerialQueue.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingDefaults.h"
 #include "session/TWReportingSession.h"

@@ -5,7 +5,6 @@
 
 #include "platform/FileSystem.h"
 #include "platform/Log.h"
-#include "platform/SerialQueue.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingSession.h"

@@ -10,7 +10,6 @@
 #include "platform/JsonService.h"
 #include "platform/Kolvi.h"
 #include "platform/Log.h"
-#include "platform/SerialQueue.h"
 #include "session/LocalTime.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingKeys.h"

@@ -6,7 +6,6 @@
 
 #include "platform/Log.h"
 #include "platform/Semaphore.h"
-#include "platform/SerialQueue.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingUtility.h"
 

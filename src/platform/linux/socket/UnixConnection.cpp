@@ -168,8 +168,8 @@ void UnixConnection::updateInterest() {
   } else {
     const bool isWatched = interest_ == 0 ? context_.epoll.add(socket_.get(), identifier_, wanted)
                                           : context_.epoll.change(socket_.get(), identifier_, wanted);
-    // add() fails when the kernel has no memory or the user watches too many descriptors. The next event or
-    // wake tries again.
+    // add() fails when the kernel has no memory or the user watches too many descriptors. The connection's
+    // next event or answer tries again; if neither comes, its client is not served.
     if (!isWatched) {
       errorLog(context_.log, "cannot wait for %@: %@", *this, std::generic_category().message(errno));
       return;
