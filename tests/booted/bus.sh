@@ -11,8 +11,8 @@ take_name_as() {
 owner() { busctl --system call org.freedesktop.DBus /org/freedesktop/DBus org.freedesktop.DBus GetConnectionUnixUser s $bus_name; }
 
 stop_daemon
-check 'somebody outside the group may not call' says 'rejected|Access ?[Dd]enied|not permitted' ask_as stranger GetAllReporters
-check 'and may not have the name' says 'Access denied' take_name_as stranger
+check 'somebody outside the group may not call' says 'rejected|Access ?[Dd]enied|not permitted' ask_as outsider GetAllReporters
+check 'and may not have the name' says 'Access denied' take_name_as outsider
 check 'a member of the group may not have the name either' says 'Access denied' take_name_as player
 stop_daemon
 check 'a call of a member starts the daemon' says '^ax ' ask_as player GetAllReporters
@@ -23,6 +23,6 @@ check 'and lives as long as its connection' await says '^ax 0$' ask_as player Ge
 check 'a message is taken' ask_as player SendMessage "'a{sv}uqax'" 2 volume d 0.5 app s bus 4 1 0
 check 'and stored' await stored_with '"app":"bus"'
 check 'what is wrong is refused with its reason' says 'argument 1' ask_as player CreateReportingSession s hello
-check 'somebody outside the group may not call a running daemon' says 'rejected|[Dd]enied|not permitted' ask_as stranger GetAllReporters
+check 'somebody outside the group may not call a running daemon' says 'rejected|[Dd]enied|not permitted' ask_as outsider GetAllReporters
 check 'the socket is still served' as player twctl --system list
 check 'the daemon has logged no error so far' eval '! journalctl --boot --unit $unit --priority 3 --output cat _COMM=twreportingd | grep .'

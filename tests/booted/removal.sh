@@ -9,11 +9,11 @@ packages=$(dpkg-query --show --showformat '${Package} ' 'tonewerk-*' 'libtwrepor
 complaint() { grep -vE '^(\(Reading database|Removing |Purging configuration|Processing triggers)' "$1"; }
 
 # A user whose service manager has no message bus.
-loginctl enable-linger stranger
+loginctl enable-linger outsider
 has_manager() { as "$1" systemctl --user --quiet is-active sockets.target; }
-check 'a second user has a service manager' await has_manager stranger
-check 'and the socket' as stranger systemctl --user --quiet is-active twreportingd.socket
-check 'but no message bus' as stranger systemctl --user stop dbus.socket dbus.service
+check 'a second user has a service manager' await has_manager outsider
+check 'and the socket' as outsider systemctl --user --quiet is-active twreportingd.socket
+check 'but no message bus' as outsider systemctl --user stop dbus.socket dbus.service
 
 # left_of PACKAGE...: prints those packages of which dpkg still keeps configuration files.
 left_of() { dpkg-query --show --showformat '${Package} ${db:Status-Status}\n' "$@" 2>/dev/null | sed -n 's/ config-files$//p'; }
@@ -36,4 +36,4 @@ check 'the packages install on a running system' eval 'dpkg --install /tests/{li
 check 'the installation complains of nothing' eval '! grep -vE "^(Selecting|Preparing|Unpacking|Setting up|Processing|Created symlink|\(Reading|Creating|/usr/lib/tmpfiles)" /tmp/install'
 check 'the first client is served at once' as player twctl --system list
 check "as is a user's own" as player twctl list
-check 'whose socket waits for the user without a bus, too' as stranger systemctl --user --quiet is-active twreportingd.socket
+check 'whose socket waits for the user without a bus, too' as outsider systemctl --user --quiet is-active twreportingd.socket

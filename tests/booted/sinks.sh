@@ -34,7 +34,7 @@ check 'the name of the device is written' twctl --system defaults write com.orva
 check 'and the running session is told of the name' await stored_with Kitchen
 check 'a notification is posted by a member of the group' as player twctl --system notify post com.orvane.homedeck.ringerstate 1
 check 'and the running session is told of it' await stored_with '"ringerstate":true'
-check 'nobody else posts' refuses as stranger twctl --system notify post com.orvane.homedeck.ringerstate 0
+check 'nobody else posts' refuses as outsider twctl --system notify post com.orvane.homedeck.ringerstate 0
 
 twctl --system defaults delete com.orvane.tonewerk device_name
 printf 'device_name = "Cellar"\n' >/etc/tonewerk/preferences/com.orvane.tonewerk.toml
