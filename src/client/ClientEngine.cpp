@@ -253,8 +253,8 @@ void ClientEngine::finish() {
 
 void ClientEngine::attempt() {
   setState(TWR_STATE_CONNECTING);
-  // Report the error of the first path at which there is a socket, rather than that there is none at the last
-  // path.
+  // If a path has a socket that cannot be used, report the error of the first such path. It says more than
+  // that the last path has no socket.
   int problem = ENOENT;
   for (const std::string& path : settings_.socketPaths) {
     const int error = connectTo(path);

@@ -36,7 +36,7 @@ struct Targets {
   WatchRequests& watch;
 };
 
-// What a request has beside its method. A handler moves out of it.
+// A request without its method. A handler moves the members out.
 struct Incoming {
   Arguments arguments;
   Reply reply;

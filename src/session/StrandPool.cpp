@@ -11,7 +11,7 @@
 namespace tonewerk {
 namespace {
 
-// What each held piece counts for beside its own bytes, so that the number of empty pieces is limited, too.
+// Counted for each held piece in addition to its own bytes, so that the number of empty pieces is limited, too.
 constexpr std::size_t kPieceBytes = 256;
 
 }  // namespace

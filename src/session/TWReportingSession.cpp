@@ -17,7 +17,8 @@ namespace {
 
 constexpr double kOldestTimestampSeconds = 31'536'000.0;  // 365 days
 
-// What a stored message takes beside its payload: the record and its entries in messages_ and newest_.
+// The bytes that a stored message takes in addition to its payload: the record and its entries in messages_
+// and newest_.
 constexpr std::size_t kRecordBytes = sizeof(TWReportingSessionMessage) + 64;
 
 const Value kUnknownName("Unknown");

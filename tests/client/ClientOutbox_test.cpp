@@ -183,7 +183,7 @@ TEST_F(ClientOutboxTest, SendsAFrameAgainWhoseLastByteHadNotGoneOut) {
   send(*one, 2);
   outbox->connected();
   const std::string bytes(outbox->unsent());
-  // All bytes but the last: one message is sent, and the other is not.
+  // All bytes except the last one: one message is sent, and the other is not.
   const std::size_t create = framesOf(bytes)[0].wireBytes;
   const std::size_t first = framesOf(bytes)[1].wireBytes;
   outbox->sent(create + first);
@@ -739,8 +739,8 @@ class ModelDaemon {
   std::map<std::int64_t, std::vector<std::int64_t>> messages_;
 };
 
-// With any calls, any number of bytes sent at a time, and breaks of the connection anywhere, the daemon has
-// in the end the sessions as they were last asked for, and every message once and in its order.
+// The calls, the number of bytes sent at a time, and the places where the connection breaks are random. In the
+// end the daemon has the sessions in the state that was requested last, and every message once and in order.
 TEST_F(ClientOutboxTest, LeadsTheDaemonToTheWantedStateHoweverTheConnectionBreaks) {
   for (unsigned seed = 0; seed < 150; ++seed) {
     SCOPED_TRACE("seed " + std::to_string(seed));

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// What the capture worker's instances write to the disk with the real capture service.
+// Tests what the capture worker's instances write to the disk with the real capture service.
 #include <filesystem>
 #include <functional>
 #include <gmock/gmock.h>

@@ -1,7 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// The whole service with the real capture service: which captures are made in a day when clients' sessions
-// show symptoms, one after the other and at once.
+// Tests the whole service with the real capture service: which captures are made in a day when clients'
+// sessions show symptoms, one after the other and at the same time.
 #include <algorithm>
 #include <gmock/gmock.h>
 #include <memory>

@@ -5,7 +5,7 @@
 
 namespace tonewerk {
 
-// A session's room may not use the service's, which stands above it.
+// The room `session` may not use the room `service`, which is above it.
 std::shared_ptr<TWReportingService> forbiddenUse() {
   return TWReportingService::make([] {});
 }

@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Tests how the daemon ends, in order and otherwise, and what the store then contains.
+// Tests how the daemon ends, by a signal, a request or a crash, and what the store then contains.
 #include <filesystem>
 #include <signal.h>
 #include <sqlite3.h>

@@ -176,8 +176,8 @@ DaemonConnection::DaemonConnection() = default;
 DaemonConnection::~DaemonConnection() = default;
 
 std::error_code DaemonConnection::connect(const std::vector<std::string>& paths) {
-  // Return the error of the first path at which there is a socket, rather than that there is none at the last
-  // path.
+  // If a path has a socket that cannot be used, return the error of the first such path. It says more than
+  // that the last path has no socket.
   std::error_code problem = std::make_error_code(std::errc::no_such_file_or_directory);
   for (const std::string& path : paths) {
     library_.reset();

@@ -57,8 +57,8 @@ std::error_code RpcClientSocket::connect(const std::string& path, milliseconds t
   if (!address) return std::make_error_code(std::errc::filename_too_long);
   socket_.reset(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
   if (!socket_) return lastError();
-  const timeval patience = timevalOf(timeout);
-  ::setsockopt(socket_.get(), SOL_SOCKET, SO_SNDTIMEO, &patience, sizeof(patience));
+  const timeval limit = timevalOf(timeout);
+  ::setsockopt(socket_.get(), SOL_SOCKET, SO_SNDTIMEO, &limit, sizeof(limit));
   while (::connect(socket_.get(), generic(*address), sizeof(*address)) != 0) {
     if (errno == EINTR) continue;
     const std::error_code error = lastError();

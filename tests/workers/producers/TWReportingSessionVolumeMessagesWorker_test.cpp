@@ -74,10 +74,9 @@ INSTANTIATE_TEST_SUITE_P(
                    {{0, {{kRunning, kOn}}}, {3, {{kVolume, 0.5}}}, {10, {{kRunning, kOff}}}},
                    {"10@0.5"}},
         StreamCase{"WithoutAVolume", {{0, {{kRunning, kOn}}}, {10, {{kRunning, kOff}}}}, {}},
-        StreamCase{
-            "StoppedWithANewVolume",  // the context of the message that ends an interval is the next one's
-            {{0, {{kRunning, kOn}, {kVolume, 0.5}}}, {10, {{kRunning, kOff}, {kVolume, 0.9}}}},
-            {"10@0.5"}},
+        StreamCase{"StoppedWithANewVolume",  // the ending message's values belong to the next interval
+                   {{0, {{kRunning, kOn}, {kVolume, 0.5}}}, {10, {{kRunning, kOff}, {kVolume, 0.9}}}},
+                   {"10@0.5"}},
         StreamCase{"StartedAgainWhilePlaying",
                    {{0, {{kRunning, kOn}, {kVolume, 0.5}}}, {4, {{kRunning, kOn}}}, {10, {{kRunning, kOff}}}},
                    {"10@0.5"}},

@@ -183,7 +183,7 @@ std::unique_ptr<ServerSocket> ServerSocket::recreate(std::string& problem) const
     return nullptr;
   }
   // Does not wait: any process that may read the directory may lock it for any length of time, and clients
-  // would wait meanwhile.
+  // would have to wait for it.
   return bound(path_, kDoNotWait, problem);
 }
 

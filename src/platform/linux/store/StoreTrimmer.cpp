@@ -15,15 +15,15 @@ namespace {
 constexpr std::int64_t kMinWalBytes = 256 << 10;
 constexpr std::int64_t kMaxWalBytes = 8 << 20;
 
-// One statement deletes so many rows of a table for their age. One round deletes so many rows of all tables,
-// or bytes, for their size. A slice is so many rounds.
+// The number of rows of a table that one statement deletes for their age.
 constexpr std::int64_t kChunkRows = 500;
+// The number of rows of all tables, or of bytes, that one round deletes for their size.
 constexpr int kRowsPerRound = 2000;
 constexpr std::int64_t kBytesPerRound = 2 << 20;
 constexpr int kRoundsPerSlice = 16;
-// A slice gives so many pages back.
+// The number of pages that a slice gives back.
 constexpr std::int64_t kVacuumPages = 512;
-// At least so many free pages stay for new rows, unless the file is too large.
+// At least this many free pages stay for new rows, unless the file is too large.
 constexpr std::int64_t kSpareFreePages = 64;
 
 // Orders by identifier, which changes of the clock do not affect. The newest row stays, so that its

@@ -611,8 +611,8 @@ TEST_F(FewDescriptorsTest, PausesWhenTheSystemHasNoDescriptorAndLogsThatOnce) {
   UnixSocketListener listener(ServerSocket::open(path, problem), category);
   listener.setDelegate(delegate);
   listener.resume();
-  // One client connects and leaves first, and an error says its text: without descriptors the sanitizer
-  // cannot read an object's type, and reports types that it has not seen before.
+  // First one client connects and disconnects, and the text of an error is used. Without descriptors the
+  // sanitizer cannot read an object's type, and reports every type that it has not seen before.
   EXPECT_FALSE(std::generic_category().message(EMFILE).empty());
   {
     RawClient early(path);
@@ -631,7 +631,7 @@ TEST_F(FewDescriptorsTest, PausesWhenTheSystemHasNoDescriptorAndLogsThatOnce) {
   RawClient second(path);
   while (log.textsOf("twrs", LogLevel::kError).empty()) std::this_thread::yield();
 
-  first.close();  // the listener's end of it is what the second one gets
+  first.close();  // the second client gets the descriptor of the listener's end
   ASSERT_TRUE(second.send(requestOf(1, "takeInt64", {Value(1)})));
   EXPECT_TRUE(second.response());
   fillers.clear();

@@ -17,7 +17,7 @@ namespace {
 using testing::HasSubstr;
 using testing::IsEmpty;
 
-// The driver's name leaves out the machine's own sound cards.
+// The tests select channels by the driver's name, which excludes the machine's own sound cards.
 class ChannelsCommandTest : public testing::Test {
  protected:
   ChannelsCommandTest() {
