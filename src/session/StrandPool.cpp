@@ -11,7 +11,7 @@
 namespace tonewerk {
 namespace {
 
-// Counted for each held piece in addition to its own bytes, so that the number of empty pieces is limited, too.
+// Counted for each held piece in addition to its own bytes, so that the number of empty pieces is limited.
 constexpr std::size_t kPieceBytes = 256;
 
 }  // namespace

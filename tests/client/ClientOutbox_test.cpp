@@ -739,8 +739,9 @@ class ModelDaemon {
   std::map<std::int64_t, std::vector<std::int64_t>> messages_;
 };
 
-// The calls, the number of bytes sent at a time, and the places where the connection breaks are random. In the
-// end the daemon has the sessions in the state that was requested last, and every message once and in order.
+// The calls, the number of bytes sent at a time, and the places where the connection breaks are random. In
+// the end the daemon has the sessions in the state that was requested last, and every message once and in
+// order.
 TEST_F(ClientOutboxTest, LeadsTheDaemonToTheWantedStateHoweverTheConnectionBreaks) {
   for (unsigned seed = 0; seed < 150; ++seed) {
     SCOPED_TRACE("seed " + std::to_string(seed));

@@ -34,8 +34,8 @@ std::string eventQuery(const EventFilter& filter) {
   return "SELECT * FROM (" + sql + " ORDER BY r.id DESC, n.position DESC LIMIT ?6) ORDER BY id";
 }
 
-// Returns a query for the rows of `sql`, which has a column `id`, oldest first. With a limit, the query returns
-// only that many of the newest rows.
+// Returns a query for the rows of `sql`, which has a column `id`, oldest first. With a limit, the query
+// returns only that many of the newest rows.
 std::string limitedById(const std::string& sql, const EventFilter& filter) {
   if (!filter.limit) return sql + " ORDER BY id";
   return "SELECT * FROM (" + sql + " ORDER BY id DESC LIMIT ?6) ORDER BY id";

@@ -640,8 +640,8 @@ class BoundedReportStoreTest : public ReportStoreTest {
   StoreBounds bounds_;
 };
 
-// Regression: 500 rows were deleted from each table at a time. With the smallest bound only the newest row was
-// left.
+// Regression: 500 rows were deleted from each table at a time. With the smallest bound only the newest row
+// was left.
 TEST_F(BoundedReportStoreTest, KeepsAsManyRowsOfAKilobyteAsTheSmallestBoundHasRoomFor) {
   openBoundedTo(1);
   for (int n = 0; n < 3000; ++n) {
