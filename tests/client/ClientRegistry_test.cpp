@@ -55,8 +55,8 @@ bool isTrueInChild(const std::function<bool()>& check) {
   return endedWell(child);
 }
 
-// Ends a child process when its thread has returned. A sanitizer would then look for leaks, and would not know
-// the memory of the threads that only the parent has.
+// Ends a child process when its thread has returned. A sanitizer would then look for leaks, and would not
+// know the memory of the threads that only the parent has.
 struct ChildThreadEnd {
   bool isChild = false;
   ~ChildThreadEnd() {
