@@ -88,6 +88,8 @@ TEST_F(RuntimeDirectoryTest, AnotherDaemonsSocketInItIsLeftAlone) {
   ASSERT_TRUE(process.start(command, other.path(DaemonProcess::kState, "output"),
                             other.path(DaemonProcess::kState, "log")));
   ASSERT_TRUE(waitUntil([&] { return other.accepts(); }));
+  // It answers when it has started: until then it may make its directory again, and a new socket there.
+  EXPECT_THAT(DaemonClient(other.socketPath()).allReporters(), testing::IsEmpty());
   // The other daemon's directory takes the place of this one's, as when another daemon is started after a
   // clean-up.
   fs::rename(other.path(DaemonProcess::kRuntime), runtime);
