@@ -226,7 +226,7 @@ void TWReportingSession::deliver(const TWReportingSessionMessage& message) {
 
 void TWReportingSession::stop() {
   assert(TWReportingUtilityIsOnReportingServerQueue());
-  (void)store(lifecycleMessage(kTypeStop, "stop"));  // likewise
+  (void)store(lifecycleMessage(kTypeStop, "stop"));  // a stop counts even when its message is not stored
   debugLog(TWReportingSessionCategory(), "stop called. reporterID=%lli", reporterID_);
   if (!started_) return logUnkeptCount();
   debugLog(TWReportingSessionCategory(), "ending session. reporterID=%lli", reporterID_);

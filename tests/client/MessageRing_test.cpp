@@ -145,7 +145,7 @@ TEST(MessageRingTest, RefusesWhatNoFrameCanHold) {
   EXPECT_EQ(ring.push(1, 0, Text(kMaxFrameBytes - 1024, 'a')), TWR_OK);
 }
 
-TEST(MessageRingTest, RefusesAPayloadWithAProblemByThatAndCountsIt) {
+TEST(MessageRingTest, ReturnsThePayloadsProblemAndCountsADrop) {
   Ring ring(4096);
   std::vector<unsigned char> memory(4);
   twr_payload payload;
@@ -176,7 +176,7 @@ TEST(MessageRingTest, CarriesWithAMessageHowManyHadBeenLostBeforeIt) {
   EXPECT_EQ(ring.dropped(), 2U);
 }
 
-TEST(MessageRingTest, CountsItsLossesAsTheSessionsWhichHasOthers) {
+TEST(MessageRingTest, AddsItsLossesToTheSessionsCount) {
   Ring ring(64);
   ring.losses.add(TWR_CATEGORY_VOLUME);
   ASSERT_EQ(ring.push(1, 0, Text(32, 'a')), TWR_OK);

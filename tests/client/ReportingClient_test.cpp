@@ -274,7 +274,7 @@ TEST_F(SocketPathsTest, AreTheChosenOneAlone) {
   EXPECT_THAT(ReportingClient::socketPaths(), ElementsAre("/elsewhere/a.sock"));
 }
 
-TEST_F(SocketPathsTest, AreOnesOwnAndThenTheSystems) {
+TEST_F(SocketPathsTest, AreTheUsersThenTheSystems) {
   ::setenv("RUNTIME_DIRECTORY", "/run/mine", 1);
   EXPECT_THAT(ReportingClient::socketPaths(),
               ElementsAre("/run/mine/reporting.sock", "/run/tonewerk/reporting.sock"));

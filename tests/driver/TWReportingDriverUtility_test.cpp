@@ -119,7 +119,7 @@ TEST_F(TWReportingDriverUtilityTest, AnErrorThatComesWithAChannelSetIsLoggedAndT
   EXPECT_THAT(logged(LogLevel::kError), ElementsAre("error 7 getting channels for driver Speaker-(null)"));
 }
 
-TEST_F(TWReportingDriverUtilityTest, AnErrorThatComesWithAChannelSetIsNotLoggedAsTheSubscriptions) {
+TEST_F(TWReportingDriverUtilityTest, ASubscriptionFailureDoesNotLogTheChannelSetsError) {
   chanmeter.fail(Operation::kCopyChannels, {.code = 7, .returnsResult = true}, kSpeaker);
   chanmeter.fail(Operation::kCreateSubscription, {}, kSpeaker);
   const TWReportingDriverUtility utility;

@@ -17,7 +17,7 @@ class EventLoop {
     virtual ~Source() = default;
   };
 
-  // Runs its callback once for each call of arm(). A new timer is stopped.
+  // Runs its callback once after arm(), unless disarm() or another arm() comes first. A new timer is stopped.
   class Timer {
    public:
     virtual ~Timer() = default;

@@ -7,8 +7,8 @@
 
 namespace tonewerk {
 
-// Recognises an alarm that is hardly audible. It has diagnostics captured one minute later, since nobody
-// seems to have heard the alarm if the session still runs then. A session that stops earlier cancels the
+// Recognises an alarm that is hardly audible. If the session still runs one minute later, the user has
+// probably not heard the alarm, and diagnostics are captured. A session that stops earlier cancels the
 // capture. Single-message sessions do not get this instance.
 class TWReportingCapsaWorkerInstanceAlarmLowRMS final : public TWReportingSessionCapsaWorkerInstance {
  public:

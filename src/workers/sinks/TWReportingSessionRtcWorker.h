@@ -15,9 +15,9 @@ class RtcReporter;
 // Forwards a session's messages to the real-time-communication reporting service when they arrive, and when
 // the session stops one summary of all their keys. Sessions of the "test" service have no such worker.
 //
-// The work queue only queues the work. The service is used on a private serial queue. The first piece there
-// waits up to nine seconds for the service's backends, and messages and the stop wait behind it. `started`
-// belongs to the session; the backends' answer does not change it.
+// The work queue only queues the work. The service is used on a strand of the shared StrandPool. Its first
+// piece waits up to nine seconds for the service's backends, and messages and the stop wait behind it.
+// `started` belongs to the session; the backends' answer does not change it.
 class TWReportingSessionRtcWorker final : public TWReportingSessionWorkerConsumerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;

@@ -14,8 +14,8 @@ std::uint32_t increase(std::uint32_t before, std::uint32_t now) { return now >= 
 
 CycleXruns XrunWatch::update(const ProfiledCycle& cycle) {
   const bool isKnown = drivers_.contains(cycle.driver);
-  // A graph has only a few drivers. So many entries come from drivers that left without retain() being
-  // called.
+  // A graph has only a few drivers. There are more than kMaxDrivers only if drivers left without a call of
+  // retain().
   if (!isKnown && drivers_.size() >= kMaxDrivers) drivers_.clear();
   Driver& driver = drivers_[cycle.driver];
 

@@ -78,7 +78,7 @@ class DaemonLink final : public SessionSink {
   bool isConnected_ = false;
   bool wasConnected_ = false;
   bool hasReportedAbsence_ = false;
-  std::string lastRefusal_;  // the same refusal is reported once in a row
+  std::string lastRefusal_;  // a refusal that equals the last one is not reported
   LoopInbox inbox_;
   twr_client* client_ = nullptr;                   // posts to the inbox until it is destroyed
   std::map<std::int64_t, twr_session*> sessions_;  // owned by client_

@@ -26,7 +26,7 @@ class RpcWriter {
 
   void request(std::uint32_t identifier, std::string_view method, const Arguments& arguments);
   void notification(std::string_view method, const Arguments& arguments);
-  // No `error` and no `result` are each written as nil.
+  // A missing `error` or `result` is written as nil.
   void response(std::uint32_t identifier, const std::optional<ReplyError>& error,
                 const std::optional<Value>& result);
 

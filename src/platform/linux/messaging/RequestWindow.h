@@ -14,8 +14,9 @@ namespace tonewerk {
 
 // Counts a connection's unfinished requests and the bytes that they hold.
 //
-// The I/O thread counts the requests that it starts, and the thread that finishes a request counts its end.
-// The I/O thread reads the second count only when the value that it read last says that the bound is reached.
+// The listener's thread counts the requests that it starts, and the thread that finishes a request counts its
+// end. The listener's thread reads the second count only when the value that it read last says that the bound
+// is reached.
 class RequestWindow final : public InFlightCounter, public std::enable_shared_from_this<RequestWindow> {
  public:
   RequestWindow(std::shared_ptr<IoWaker> waker, std::uint64_t connection)
@@ -24,12 +25,13 @@ class RequestWindow final : public InFlightCounter, public std::enable_shared_fr
   // Any thread.
   void finished(std::size_t bytes) override;
 
-  // The I/O thread. A request begins; it ends when the token is destroyed.
+  // The listener's thread. A request begins; it ends when the token is destroyed.
   [[nodiscard]] InFlightToken start(std::size_t bytes);
 
-  // The I/O thread. True when there is room for another request beside `otherBytes` that the connection
-  // holds. When there is none, the connection is woken once half of its unfinished requests have finished. It
-  // is not woken for each, so that an overloaded daemon does not switch threads for every request.
+  // The listener's thread. True when there is room for another request beside `otherBytes` that the
+  // connection holds. When there is none, the connection is woken once half of its unfinished requests have
+  // finished. It is not woken for each, so that an overloaded daemon does not switch threads for every
+  // request.
   [[nodiscard]] bool hasRoom(std::size_t otherBytes);
 
  private:
@@ -40,7 +42,7 @@ class RequestWindow final : public InFlightCounter, public std::enable_shared_fr
   const std::shared_ptr<IoWaker> waker_;
   const std::uint64_t connection_;
 
-  // Used by the I/O thread only.
+  // Used by the listener's thread only.
   std::uint64_t startedRequests_ = 0;
   std::uint64_t startedBytes_ = 0;
   std::uint64_t knownFinishedRequests_ = 0;
@@ -48,7 +50,8 @@ class RequestWindow final : public InFlightCounter, public std::enable_shared_fr
 
   std::atomic<std::uint64_t> finishedRequests_{0};
   std::atomic<std::uint64_t> finishedBytes_{0};
-  std::atomic<std::uint64_t> wakeAt_{kNever};  // the count of finished requests that the I/O thread waits for
+  // The count of finished requests that the listener's thread waits for.
+  std::atomic<std::uint64_t> wakeAt_{kNever};
 };
 
 }  // namespace tonewerk

@@ -18,9 +18,9 @@ namespace tonewerk {
 // are dropped.
 //
 //   reply() ... reply() -> unsent -> the socket     sent by the thread that replied, at the end of its batch;
-//                             |                     after a full socket: by the I/O thread, later
+//                             |                     after a full socket: by the listener's thread, later
 //                             |
-//                             +-> the I/O thread is woken when it has something to do
+//                             +-> the listener's thread is woken when it has something to do
 //
 // The thread that replies also sends, because waking another thread would cost more than sending.
 class ReplyOutbox final : public ReplySink,
@@ -29,11 +29,11 @@ class ReplyOutbox final : public ReplySink,
  public:
   enum class State {
     kOpen,
-    kFull,     // the socket takes no more for now; only the I/O thread sends again
+    kFull,     // the socket takes no more for now; only the listener's thread sends again
     kRefused,  // the peer does not take any more bytes
   };
 
-  // `socket` stays open until close(). The waker wakes the I/O thread for `connection`.
+  // `socket` stays open until close(). The waker wakes the listener's thread for `connection`.
   ReplyOutbox(int socket, std::shared_ptr<IoWaker> waker, std::uint64_t connection)
       : socket_(socket), waker_(std::move(waker)), connection_(connection) {}
 
@@ -42,11 +42,11 @@ class ReplyOutbox final : public ReplySink,
              const std::optional<Value>& result) override;
   void endOfBatch() override;
 
-  // The I/O thread. Sends what the socket did not take before.
+  // The listener's thread. Sends what the socket did not take before.
   [[nodiscard]] State flush();
   // Any thread.
   std::size_t unsentBytes() const { return unsentBytes_.load(std::memory_order_relaxed); }
-  // The I/O thread, before it closes the socket. Sends as much as the socket still takes.
+  // The listener's thread, before it closes the socket. Sends as much as the socket still takes.
   void close();
 
  private:

@@ -29,9 +29,11 @@ class ServerSocket {
   // True while its file is where it was made, so that clients find it. The file may have been removed, with
   // its directory or without.
   bool isInPlace() const;
-  // Makes a new socket at the path of one whose file was removed. The directory must exist again. None, with
-  // the reason in `problem`, when that fails, for a socket that systemd passed, which only systemd can make
-  // again, and while another process has locked the directory. Does not wait.
+  // Makes a new socket at the path of one whose file was removed. The directory must exist again. Does not
+  // wait. Returns none, with the reason in `problem`:
+  // - when the system refuses it,
+  // - for a socket that systemd passed, because only systemd can make it again,
+  // - while another process has locked the directory.
   [[nodiscard]] std::unique_ptr<ServerSocket> recreate(std::string& problem) const;
 
   // Non-blocking.

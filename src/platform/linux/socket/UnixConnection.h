@@ -23,7 +23,7 @@ namespace tonewerk {
 
 class AllocatorReclaimer;
 
-// What the connections of one I/O thread share.
+// What the connections of one listener's thread share.
 struct UnixConnectionContext {
   Epoll& epoll;
   std::shared_ptr<IoWaker> waker;
@@ -35,7 +35,7 @@ struct UnixConnectionContext {
   AllocatorReclaimer* memory;
 };
 
-// Serves one client's socket, on the I/O thread.
+// Serves one client's socket, on the listener's thread.
 //
 //   socket -> readBuffer -> RpcFrameReader -> exported object      as long as there is room for requests
 //   socket <- ReplyOutbox <- replies of any thread

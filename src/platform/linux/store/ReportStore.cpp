@@ -54,7 +54,7 @@ void ReportStore::record(StoreRow row) {
 
 void ReportStore::readBoundsAgain() {
   areBoundsStale_ = true;
-  queue_.nudge();
+  queue_.wakeWriter();
 }
 
 bool ReportStore::flush(std::chrono::milliseconds timeout) {
@@ -65,7 +65,7 @@ bool ReportStore::flush(std::chrono::milliseconds timeout) {
 void ReportStore::run() {
   pthread_setname_np(pthread_self(), "tw-store");
   // The file is made, and its problems are logged, before the first row is recorded.
-  queue_.attempt();
+  queue_.beginAttempt();
   if (write()) {
     queue_.committed();
   } else {
@@ -80,7 +80,7 @@ void ReportStore::run() {
 bool ReportStore::writeUntilDone() {
   GrowingDelay backOff(kFirstBackOff, kLongestBackOff);
   for (;;) {
-    queue_.attempt();
+    queue_.beginAttempt();
     if (write()) break;
     queue_.failed();
     if (!queue_.pause(backOff.next())) {

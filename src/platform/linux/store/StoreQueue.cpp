@@ -8,20 +8,20 @@ namespace tonewerk {
 bool StoreQueue::add(StoreRow row) {
   MutexLock lock(mutex_);
   const std::size_t bytes = bytesOf(row);
-  bool heldUp = false;
-  if (!fits(bytes) && holds_) {
+  bool hasTimedOut = false;
+  if (!fits(bytes) && waitsForRoom_) {
     const auto deadline = std::chrono::steady_clock::now() + limits_.hold;
-    while (!fits(bytes) && holds_ && room_.waitUntil(lock, deadline)) {
+    while (!fits(bytes) && waitsForRoom_ && room_.waitUntil(lock, deadline)) {
     }
-    heldUp = !fits(bytes) && holds_;
-    if (heldUp) {
-      holds_ = false;
+    hasTimedOut = !fits(bytes) && waitsForRoom_;
+    if (hasTimedOut) {
+      waitsForRoom_ = false;
       room_.notifyAll();
     }
   }
   if (!fits(bytes)) {
     ++dropped_;
-    return heldUp;
+    return hasTimedOut;
   }
   const bool wasUrgent = isUrgent();
   queued_.emplace_back(std::move(row));
@@ -54,12 +54,12 @@ bool StoreQueue::take(std::vector<StoreRow>& batch, bool wait) {
   batch.clear();
   MutexLock lock(mutex_);
   if (wait) {
-    while (queued_.empty() && !stopped_ && !nudged_) work_.wait(lock);
+    while (queued_.empty() && !stopped_ && !isWoken_) work_.wait(lock);
     const auto deadline = std::chrono::steady_clock::now() + limits_.gather;
     while (!isUrgent() && work_.waitUntil(lock, deadline)) {
     }
   }
-  nudged_ = false;
+  isWoken_ = false;
   takenBytes_ = 0;
   while (!queued_.empty() && batch.size() < limits_.batchRows && takenBytes_ < limits_.batchBytes) {
     takenBytes_ += bytesOf(queued_.front());
@@ -72,13 +72,13 @@ bool StoreQueue::take(std::vector<StoreRow>& batch, bool wait) {
   return !batch.empty() || !stopped_;
 }
 
-void StoreQueue::nudge() {
+void StoreQueue::wakeWriter() {
   const MutexLock lock(mutex_);
-  nudged_ = true;
+  isWoken_ = true;
   work_.notifyAll();
 }
 
-void StoreQueue::attempt() {
+void StoreQueue::beginAttempt() {
   const MutexLock lock(mutex_);
   attemptedFlush_ = lastFlush_;
 }
@@ -87,7 +87,7 @@ void StoreQueue::committed() {
   const MutexLock lock(mutex_);
   committed_ += std::exchange(takenRows_, 0);
   takenBytes_ = 0;
-  holds_ = true;
+  waitsForRoom_ = true;
   room_.notifyAll();
   progress_.notifyAll();
 }
@@ -95,7 +95,7 @@ void StoreQueue::committed() {
 void StoreQueue::failed() {
   const MutexLock lock(mutex_);
   failedFlush_ = attemptedFlush_;
-  holds_ = false;
+  waitsForRoom_ = false;
   room_.notifyAll();
   progress_.notifyAll();
 }
@@ -125,7 +125,7 @@ bool StoreQueue::fits(std::size_t bytes) const {
 }
 
 bool StoreQueue::isUrgent() const {
-  return stopped_ || nudged_ || leftOver_ || openFlushes_ > 0 || queued_.size() >= limits_.batchRows ||
+  return stopped_ || isWoken_ || leftOver_ || openFlushes_ > 0 || queued_.size() >= limits_.batchRows ||
          queuedBytes_ >= limits_.bytes / 4;
 }
 

@@ -27,11 +27,10 @@ class StoreQueue {
   struct Limits {
     std::size_t rows = 8192;
     std::size_t bytes = 16 << 20;
-    // The writer waits this long for more rows, or until there are so many or a quarter of the bytes.
+    // The writer waits this long for more rows, or until `batchRows` rows or a quarter of `bytes` wait.
     std::chrono::milliseconds gather{80};
     std::size_t batchRows = 1000;
-    // One batch has at most so many rows and about so many bytes, so that the file exceeds its bounds by no
-    // more.
+    // The most rows of one batch, and about the most bytes: the file exceeds its bounds by one batch at most.
     std::size_t batchBytes = 512 << 10;
     // The longest time that add() waits.
     std::chrono::milliseconds hold{2000};
@@ -47,7 +46,7 @@ class StoreQueue {
   [[nodiscard]] bool flush(std::chrono::milliseconds timeout);
 
   // Any thread. The next take(), or one that waits now, returns without waiting for rows, perhaps with none.
-  void nudge();
+  void wakeWriter();
 
   // Any thread. Ends take() when the queue is empty, and pause().
   void stop();
@@ -57,7 +56,7 @@ class StoreQueue {
   // empty.
   [[nodiscard]] bool take(std::vector<StoreRow>& batch, bool wait);
   // A try to write the batch begins.
-  void attempt();
+  void beginAttempt();
   // The batch is in the file.
   void committed();
   // The batch is not in the file. The writer keeps it.
@@ -87,9 +86,9 @@ class StoreQueue {
   std::size_t queuedBytes_ GUARDED_BY(mutex_) = 0;
   std::size_t takenRows_ GUARDED_BY(mutex_) = 0;
   std::size_t takenBytes_ GUARDED_BY(mutex_) = 0;
-  bool holds_ GUARDED_BY(mutex_) = true;  // whether add() waits for room
+  bool waitsForRoom_ GUARDED_BY(mutex_) = true;  // whether add() waits for room
   bool stopped_ GUARDED_BY(mutex_) = false;
-  bool nudged_ GUARDED_BY(mutex_) = false;
+  bool isWoken_ GUARDED_BY(mutex_) = false;
   std::uint64_t added_ GUARDED_BY(mutex_) = 0;
   std::uint64_t committed_ GUARDED_BY(mutex_) = 0;
   std::uint64_t dropped_ GUARDED_BY(mutex_) = 0;

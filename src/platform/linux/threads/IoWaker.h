@@ -9,8 +9,8 @@
 
 namespace tonewerk {
 
-// Tells the I/O thread which connections need attention: one has a reply to send, another has room for
-// requests again. One signal is enough for all that ask while the I/O thread is busy.
+// Tells the listener's thread which connections need attention: one has a reply to send, another has room for
+// requests again. One signal is enough for all that ask while the listener's thread is busy.
 class IoWaker {
  public:
   IoWaker();
@@ -18,10 +18,10 @@ class IoWaker {
   // Any thread.
   void wake(std::uint64_t connection);
 
-  // The I/O thread. Becomes readable when a connection asks. Watch it edge-triggered; it need not be read
-  // then, because every signal is a new edge.
+  // The listener's thread. Becomes readable when a connection asks. Watch it edge-triggered; it need not be
+  // read then, because every signal is a new edge.
   int fileDescriptor() const { return event_.get(); }
-  // The I/O thread. The connections that asked since the last call.
+  // The listener's thread. The connections that asked since the last call.
   [[nodiscard]] std::vector<std::uint64_t> take();
 
  private:

@@ -67,7 +67,7 @@ const std::vector<Named<AudioEventCategory>>& categoriesOfDomains() {
 const std::vector<Named<AudioEventType>>& types() {
   static const auto all = [] {
     std::vector<Named<AudioEventType>> named;
-    // Numbers without a name of their own have the name of the first.
+    // A type without a name has the text of type 0.
     for (AudioEventType type = 0; type < kNamesEnd; ++type) {
       std::string name = TWReportingUtilityTypeString(type);
       if (named.empty() || name != named.front().name) named.push_back({std::move(name), type});

@@ -21,7 +21,7 @@ TEST(OverloadPacer, LetsTheFirstOnePassAtOnce) {
   EXPECT_EQ(pacer.take(milliseconds(0)), std::nullopt);
 }
 
-TEST(OverloadPacer, AddsUpLaterOnesToOneASecond) {
+TEST(OverloadPacer, MergesLaterOverloadsIntoOnePerSecond) {
   OverloadPacer pacer;
   pacer.add(kFirst);
   EXPECT_EQ(pacer.take(milliseconds(500)), kFirst);

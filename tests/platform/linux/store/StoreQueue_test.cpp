@@ -95,7 +95,7 @@ TEST_F(StoreQueueTest, FlushEndsWithTheCommit) {
   EXPECT_FALSE(queue_.add(row(0)));
   auto flushed = std::async(std::launch::async, [&] { return queue_.flush(kLongEnough); });
   ASSERT_TRUE(queue_.take(batch_, true));
-  queue_.attempt();
+  queue_.beginAttempt();
   queue_.committed();
   EXPECT_TRUE(flushed.get());
 }
@@ -103,11 +103,11 @@ TEST_F(StoreQueueTest, FlushEndsWithTheCommit) {
 TEST_F(StoreQueueTest, FlushIsTriedOnceMoreBeforeItFails) {
   EXPECT_FALSE(queue_.add(row(0)));
   ASSERT_TRUE(queue_.take(batch_, true));
-  queue_.attempt();
+  queue_.beginAttempt();
   queue_.failed();
   auto flushed = std::async(std::launch::async, [&] { return queue_.flush(kLongEnough); });
   EXPECT_TRUE(queue_.pause(kLongEnough));  // the flush ended it
-  queue_.attempt();
+  queue_.beginAttempt();
   queue_.failed();
   EXPECT_FALSE(flushed.get());
 }
@@ -131,13 +131,13 @@ TEST_F(StoreQueueTest, ReturnsTheRemainingRowsBeforeItStops) {
 }
 
 TEST_F(StoreQueueTest, ANudgedWriterReturnsWithoutRows) {
-  queue_.nudge();
+  queue_.wakeWriter();
   ASSERT_TRUE(queue_.take(batch_, true));
   EXPECT_THAT(batch_, IsEmpty());
   queue_.committed();
 
   auto writer = std::async(std::launch::async, [this] { return queue_.take(batch_, true); });
-  queue_.nudge();
+  queue_.wakeWriter();
   EXPECT_TRUE(writer.get());
   EXPECT_THAT(batch_, IsEmpty());
 }
