@@ -13,7 +13,7 @@
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
   tonewerk::ProtozeroReader reader(std::string_view(reinterpret_cast<const char*>(data), size));
   tonewerk::diagwiremetrics::AudioIssueDetected record;
-  record.readFrom(reader);
+  (void)record.readFrom(reader);  // whatever was read before an error must survive as well
   tonewerk::ProtozeroWriter writer;
   record.writeTo(writer);
   tonewerk::ProtozeroReader again(writer.bytes());
