@@ -43,7 +43,7 @@ struct DbusPeer {
 // Serves one client on the bus, on the bus's thread. A client is a unique name that has made a request.
 //
 //   handleCall() ... handleCall()   requests wait
-//   identify()                      asks the delegate; the requests then go to the exported object
+//   identify()                      asks the delegate; the requests then go to the request handler
 //   handleCall() ...                requests go to the object at once
 //   end()                           the name has vanished, or the bus is gone
 //

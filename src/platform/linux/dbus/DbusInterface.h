@@ -12,7 +12,7 @@ struct sd_bus_vtable;
 
 namespace tonewerk {
 
-// Describes an exported interface for D-Bus: its methods in upper camel case, with the signatures of their
+// Describes a request set for D-Bus: its methods in upper camel case, with the signatures of their
 // parameters and results. It leaves out the methods that only the daemon's owner may call.
 //
 //   kInt64 x   kUInt32 u   kUInt16 q   kMap a{sv}   kInt64ListOrNone ax (an empty one is none)
@@ -21,7 +21,7 @@ class DbusInterface {
  public:
   struct Entry {
     std::string member;     // its name on the bus
-    std::size_t index = 0;  // in the methods of the exported interface
+    std::size_t index = 0;  // in the methods of the request set
     std::string signature;
     std::string result;
     std::string names;  // of the parameters and the result, each with a zero byte at its end

@@ -37,7 +37,7 @@ struct UnixConnectionContext {
 
 // Serves one client's socket, on the listener's thread.
 //
-//   socket -> readBuffer -> RpcFrameReader -> exported object      as long as there is room for requests
+//   socket -> readBuffer -> RpcFrameReader -> request handler      as long as there is room for requests
 //   socket <- ReplyOutbox <- replies of any thread
 //
 // A connection without room for requests is paused: bytes that were read and not used wait in unprocessed_,

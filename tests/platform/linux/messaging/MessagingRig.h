@@ -18,7 +18,7 @@ namespace tonewerk {
 // Long enough for the slowest machine. Only a failing test waits this long.
 inline constexpr std::chrono::seconds kPatience{30};
 
-// A request that an exported object received.
+// A request that a request handler received.
 struct ReceivedRequest {
   std::string method;
   Arguments arguments;
