@@ -18,6 +18,20 @@ using ::testing::IsEmpty;
 
 class TWReportingUtilityTest : public ReportingTest {};
 
+// The work queue.
+
+TEST_F(TWReportingUtilityTest, OtherThreadsAreNotOnTheWorkQueueOnceItExists) {
+  const auto isOnQueueElsewhere = [] {
+    bool is = false;
+    std::thread([&] { is = TWReportingUtilityIsOnReportingServerQueue(); }).join();
+    return is;
+  };
+  EXPECT_TRUE(isOnQueueElsewhere());
+  TWReportingUtilityGetReportingServerQueue();
+  EXPECT_FALSE(isOnQueueElsewhere());
+  EXPECT_TRUE(TWReportingUtilityIsOnReportingServerQueue());
+}
+
 // Names of categories.
 
 TEST_F(TWReportingUtilityTest, NamesEveryBaseCategory) {

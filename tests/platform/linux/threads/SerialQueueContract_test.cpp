@@ -49,6 +49,17 @@ TYPED_TEST(SerialQueueContract, IsCurrentInItsOwnWorkOnly) {
   EXPECT_FALSE(queue->isCurrent());
 }
 
+TYPED_TEST(SerialQueueContract, OwnsTheThreadOfItsWorkAndNoOther) {
+  const auto queue = this->makeQueue();
+  bool isOwn = false;
+  queue->async([&] { isOwn = queue->ownsThisThread(); });
+  queue->drain();
+  EXPECT_TRUE(isOwn);
+  bool isOthers = true;
+  std::thread([&] { isOthers = queue->ownsThisThread(); }).join();
+  EXPECT_FALSE(isOthers);
+}
+
 TYPED_TEST(SerialQueueContract, DestructionRunsWhatIsQueuedAndWhatThatQueues) {
   auto queue = this->makeQueue();
   int ran = 0;
