@@ -71,14 +71,35 @@ class InFlightToken {
   std::size_t bytes_ = 0;
 };
 
+// Requests of one connection that arrived together and are not decoded yet.
+class ReceivedRequests {
+ public:
+  virtual ~ReceivedRequests() = default;
+
+  // Decodes the requests in the order of their arrival and gives them to the connection's handler, whose
+  // handleRequest() runs on this thread. Requests that do not fit their method are answered here. Any thread;
+  // called at most once. Those of one connection, and of all connections of one listener, are delivered one
+  // after the other.
+  virtual void deliver() = 0;
+};
+
 // Handles the requests of a connection.
 class RequestHandler {
  public:
   virtual ~RequestHandler() = default;
 
-  // Runs on the messaging thread, in the order of arrival. It must not block. `method` is the index in the
-  // request set; `arguments` fit the method.
+  // Handles one request. `method` is the index in the request set; `arguments` fit the method. Runs on the
+  // messaging thread and must not block, unless handleReceived() delivers on another thread.
   virtual void handleRequest(std::size_t method, Arguments arguments, Reply reply, InFlightToken token) = 0;
+
+  // Runs on the messaging thread and must not block: delivers the requests, or sees that another thread does,
+  // in the order of these calls. A transport that decodes on its own thread calls handleRequest() instead.
+  virtual void handleReceived(std::unique_ptr<ReceivedRequests> requests) { requests->deliver(); }
+
+  // Runs on the messaging thread for each request in the order of arrival, before it is checked. True when it
+  // must not wait for what handleReceived() has passed on: it is then delivered at once on the messaging
+  // thread.
+  virtual bool isUrgent(std::size_t /*method*/) { return false; }
 };
 
 }  // namespace tonewerk

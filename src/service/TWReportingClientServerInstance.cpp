@@ -46,17 +46,21 @@ TWReportingClientServerInstance::~TWReportingClientServerInstance() {
 
 template <typename Body>
 void TWReportingClientServerInstance::onWorkQueue(ServiceRequest request, Body body) {
-  TWReportingUtilityGetReportingServerQueue().async(
-      [self = shared_from_this(), request = std::move(request), body = std::move(body)]() mutable {
-        if (const Delegate delegate = self->delegate_.lock()) body(*self, *delegate, request.reply);
-      });
+  SerialQueue& queue = TWReportingUtilityGetReportingServerQueue();
+  if (queue.isCurrent()) {
+    if (const Delegate delegate = delegate_.lock()) body(*this, *delegate, request.reply);
+    return;
+  }
+  queue.async([self = shared_from_this(), request = std::move(request), body = std::move(body)]() mutable {
+    if (const Delegate delegate = self->delegate_.lock()) body(*self, *delegate, request.reply);
+  });
 }
 
 void TWReportingClientServerInstance::createReportingSession(ReporterID reporterID, ServiceRequest request) {
   onWorkQueue(std::move(request), [reporterID](auto& self, auto&, const Reply& reply) {
     const TracedRequest traced(TWReportingTracePoint::kRequestCreate, reporterID);
     debugLog(category(), "creating session for reporter %lli", reporterID);
-    SessionMap& sessions = self.clientReportingSessionMap_;
+    const SessionMap& sessions = self.clientReportingSessionMap_;
     if (sessions.size() >= kMaxSessions && !sessions.contains(reporterID)) {
       return reply(messagingError(kOverLimit, "the connection holds " + std::to_string(sessions.size()) +
                                                   " sessions, the most there may be"));

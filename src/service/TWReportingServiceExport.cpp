@@ -10,8 +10,10 @@
 #include <utility>
 #include <vector>
 
+#include "platform/SerialQueue.h"
 #include "protocol/Requests.h"
 #include "service/WatchRequests.h"
+#include "session/TWReportingUtility.h"
 
 namespace tonewerk {
 namespace {
@@ -153,6 +155,17 @@ std::optional<ReplyError> TWReportingServiceExport::takeRole(const Method& metho
     role_ = Role::kClient;
   }
   return std::nullopt;
+}
+
+void TWReportingServiceExport::handleReceived(std::unique_ptr<ReceivedRequests> requests) {
+  TWReportingUtilityGetReportingServerQueue().async(
+      [received = std::move(requests)] { received->deliver(); });
+}
+
+bool TWReportingServiceExport::isUrgent(std::size_t method) {
+  const std::string_view name = requests::kAll[method].name;
+  if (name == requests::kObserve.name) hasAskedToObserve_ = true;
+  return name == requests::kKillService.name && !hasAskedToObserve_;
 }
 
 void TWReportingServiceExport::handleRequest(std::size_t method, Arguments arguments, Reply reply,

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <atomic>
 #include <cstddef>
 #include <memory>
 #include <optional>
@@ -23,8 +24,14 @@ class TWReportingServiceExport final : public RequestHandler {
                            std::unique_ptr<WatchRequests> watch);
   ~TWReportingServiceExport() override;
 
-  // `method`: the index in requests::all().
+  // `method`: the index in requests::all(). Runs on the work queue or, for transports that decode themselves
+  // and for urgent requests, on the messaging thread.
   void handleRequest(std::size_t method, Arguments arguments, Reply reply, InFlightToken token) override;
+  // Has the work queue deliver the requests, so that no value is made on one thread and freed on another.
+  void handleReceived(std::unique_ptr<ReceivedRequests> requests) override;
+  // True for the request to end the process, which does not wait for the work queue. But once the connection
+  // has asked to be an onlooker, the answer to that comes first.
+  bool isUrgent(std::size_t method) override;
 
  private:
   enum class Role { kOpen, kClient, kOnlooker };
@@ -32,7 +39,8 @@ class TWReportingServiceExport final : public RequestHandler {
   // Gives the connection the role that the method needs. Returns an error when it already has the other role.
   [[nodiscard]] std::optional<ReplyError> takeRole(const Method& method);
 
-  Role role_ = Role::kOpen;  // used on the messaging thread
+  std::atomic<Role> role_ = Role::kOpen;
+  bool hasAskedToObserve_ = false;  // used on the messaging thread
   const std::shared_ptr<TWReportingServiceProtocol> object_;
   const std::unique_ptr<WatchRequests> watch_;
 };

@@ -45,9 +45,13 @@ WatchRequests::WatchRequests(std::int32_t processIdentifier,
 
 template <class Body>
 void WatchRequests::onWorkQueue(Body body, Reply reply, InFlightToken token) {
-  TWReportingUtilityGetReportingServerQueue().async([service = service_, body = std::move(body),
-                                                     reply = std::move(reply),
-                                                     token = std::move(token)]() mutable {
+  SerialQueue& queue = TWReportingUtilityGetReportingServerQueue();
+  if (queue.isCurrent()) {
+    if (const auto service = service_.lock()) body(*service, reply, token);
+    return;
+  }
+  queue.async([service = service_, body = std::move(body), reply = std::move(reply),
+               token = std::move(token)]() mutable {
     if (const auto living = service.lock()) body(*living, reply, token);
   });
 }

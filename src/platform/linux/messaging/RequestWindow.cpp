@@ -12,9 +12,13 @@ void RequestWindow::finished(std::size_t bytes) {
   if (finishedRequests_.fetch_add(1) + 1 == wakeAt_.load()) waker_->wake(connection_);
 }
 
-InFlightToken RequestWindow::start(std::size_t bytes) {
+void RequestWindow::begin(std::size_t bytes) {
   ++startedRequests_;
   startedBytes_ += bytes;
+}
+
+InFlightToken RequestWindow::start(std::size_t bytes) {
+  begin(bytes);
   return {shared_from_this(), bytes};
 }
 

@@ -25,6 +25,8 @@ class RequestWindow final : public InFlightCounter, public std::enable_shared_fr
   // Any thread.
   void finished(std::size_t bytes) override;
 
+  // The listener's thread. A request begins; it ends with finished() of the same bytes.
+  void begin(std::size_t bytes);
   // The listener's thread. A request begins; it ends when the token is destroyed.
   [[nodiscard]] InFlightToken start(std::size_t bytes);
 

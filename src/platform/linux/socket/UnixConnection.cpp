@@ -3,37 +3,20 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <span>
 #include <sys/socket.h>
 #include <system_error>
 #include <utility>
 
 #include "platform/Log.h"
 #include "platform/linux/messaging/AllocatorReclaimer.h"
-#include "values/ShortenedText.h"
 
 namespace tonewerk {
 namespace {
 
-// How much of an unknown method's name is repeated in the answer.
-constexpr std::size_t kMaxMethodNameBytes = 64;
-
-std::string problemText(const Method& method, const RefusedValue& refused) {
-  std::string text = std::string(method.name) + ": argument " + std::to_string(refused.argument + 1);
-  if (refused.argument < method.parameters.size()) {
-    text += " (" + std::string(method.parameters[refused.argument].name) + ")";
-  }
-  return text + " " + refused.what;
-}
-
-// The bytes that a request holds until it has finished: its frame's size or the size of its values, whichever
-// is larger.
-std::size_t bytesHeldBy(const RpcFrame& frame) {
-  std::size_t bytes = frame.arguments.capacity() * sizeof(Argument);
-  for (const Argument& argument : frame.arguments) {
-    if (argument) bytes += argument->bytes();
-  }
-  return std::max(bytes, frame.wireBytes);
-}
+// A frame that did not arrive in one read is completed in slices, so that few bytes of later frames are
+// copied.
+constexpr std::size_t kSliceBytes = 4096;
 
 }  // namespace
 
@@ -42,7 +25,6 @@ UnixConnection::UnixConnection(const UnixConnectionContext& context, std::uint64
     : context_(context),
       identifier_(identifier),
       socket_(std::move(socket)),
-      reader_(context.texts),
       window_(std::make_shared<RequestWindow>(context.waker, identifier)),
       outbox_(std::make_shared<ReplyOutbox>(socket_.get(), context.waker, identifier)) {
   ucred peer{};
@@ -64,12 +46,12 @@ std::string UnixConnection::description() const {
 }
 
 void UnixConnection::setRequestHandler(const RequestSet& interface, std::shared_ptr<RequestHandler> object) {
-  interface_ = &interface;
-  object_ = std::move(object);
+  requestContext_ = std::make_shared<UnixRequestContext>(UnixRequestContext{
+      interface, std::move(object), context_.decoder, outbox_, window_, userIdentifier_, context_.owner});
 }
 
 void UnixConnection::resume() {
-  if (object_ == nullptr) return;
+  if (requestContext_ == nullptr) return;
   isResumed_ = true;
   updateInterest();
 }
@@ -89,12 +71,12 @@ void UnixConnection::handleWake() {
 }
 
 void UnixConnection::receive() {
-  const ssize_t count =
-      ::recv(socket_.get(), context_.readBuffer.data(), context_.readBuffer.size(), MSG_DONTWAIT);
+  const std::span<char> room = context_.slabs.room();
+  const ssize_t count = ::recv(socket_.get(), room.data(), room.size(), MSG_DONTWAIT);
   if (count > 0) {
     const auto bytes = static_cast<std::size_t>(count);
     if (context_.memory != nullptr) context_.memory->clientSent(bytes);
-    return process({context_.readBuffer.data(), bytes});
+    return process(context_.slabs.commit(bytes));
   }
   if (count == 0) return end();
   if (errno == EINTR) return;
@@ -108,43 +90,59 @@ void UnixConnection::receive() {
   end();
 }
 
-void UnixConnection::process(std::string_view bytes) {
+void UnixConnection::process(SlabBytes received) {
   isPaused_ = false;
+  auto requests = std::make_unique<UnixRequests>(requestContext_, received.slab);
   while (hasRoom()) {
-    switch (reader_.next(bytes)) {
-      case RpcFrameReader::Result::kFrame:
-        dispatch(reader_.frame());
-        break;
-      case RpcFrameReader::Result::kNeedsMore:
-        return;
-      case RpcFrameReader::Result::kBroken:
-        return endAsBroken(reader_.problem());
+    const bool isBegun = !begun_.empty();
+    const std::string_view bytes = received.bytes;
+    const RpcFrameScanner::Result result = scan(received.bytes);
+    if (result != RpcFrameScanner::Result::kFrame) {
+      passOn(std::move(requests));
+      if (result == RpcFrameScanner::Result::kBroken) endAsBroken(scanner_.problem());
+      return;
     }
-    if (hasEnded_) return;
+    const RpcFrameScanner::Frame& frame = scanner_.frame();
+    const std::optional<std::size_t> method = requestContext_->methods.find(frame.method);
+    const bool isUrgent = method && requestContext_->handler->isUrgent(*method);
+    if (isUrgent) {
+      passOn(std::exchange(requests, std::make_unique<UnixRequests>(requestContext_, received.slab)));
+    }
+    if (isBegun) {
+      requests->addFirst(frame, std::exchange(begun_, {}), method);
+    } else {
+      requests->add(frame, bytes.substr(0, frame.bytes), method);
+    }
+    if (isUrgent) {
+      requests->deliverAtOnce();
+      requests = std::make_unique<UnixRequests>(requestContext_, received.slab);
+    }
   }
   isPaused_ = true;
-  unprocessed_ = bytes;
+  unprocessed_ = std::move(received);
+  passOn(std::move(requests));
 }
 
-void UnixConnection::dispatch(RpcFrame& frame) {
-  if (frame.kind == RpcFrame::Kind::kResponse) return endAsBroken("a response");
-  const std::optional<std::size_t> method = interface_->find(frame.method);
-  Reply reply = frame.kind == RpcFrame::Kind::kRequest ? Reply(outbox_, frame.identifier) : Reply();
-  if (const auto problem = problemWithFrame(frame, method)) return reply(problem);
-  InFlightToken token = window_->start(bytesHeldBy(frame) + interface_->methods[*method].replyBytes);
-  object_->handleRequest(*method, std::move(frame.arguments), std::move(reply), std::move(token));
+RpcFrameScanner::Result UnixConnection::scan(std::string_view& bytes) {
+  if (begun_.empty()) {
+    const RpcFrameScanner::Result result = scanner_.scan(bytes);
+    if (result == RpcFrameScanner::Result::kNeedsMore) begun_ = bytes;
+    bytes.remove_prefix(result == RpcFrameScanner::Result::kFrame ? scanner_.frame().bytes : bytes.size());
+    return result;
+  }
+  auto result = RpcFrameScanner::Result::kNeedsMore;
+  while (result == RpcFrameScanner::Result::kNeedsMore && !bytes.empty()) {
+    const std::size_t before = begun_.size();
+    begun_.append(bytes.substr(0, kSliceBytes));
+    result = scanner_.scan(begun_);
+    if (result == RpcFrameScanner::Result::kFrame) begun_.resize(scanner_.frame().bytes);
+    bytes.remove_prefix(begun_.size() - before);
+  }
+  return result;
 }
 
-std::optional<ReplyError> UnixConnection::problemWithFrame(const RpcFrame& frame,
-                                                           std::optional<std::size_t> method) const {
-  if (!method)
-    return messagingError(kUnknownMethod,
-                          "unknown method " + std::string(shortened(frame.method, kMaxMethodNameBytes)));
-  const Method& known = interface_->methods[*method];
-  if (auto problem = problemWithCaller(known, userIdentifier_, context_.owner)) return problem;
-  if (frame.refused) return messagingError(kInvalidArguments, problemText(known, *frame.refused));
-  std::optional<std::string> problem = problemWith(known, frame.arguments);
-  return problem ? std::optional(messagingError(kInvalidArguments, std::move(*problem))) : std::nullopt;
+void UnixConnection::passOn(std::unique_ptr<UnixRequests> requests) {
+  if (!requests->empty()) requestContext_->handler->handleReceived(std::move(requests));
 }
 
 void UnixConnection::endAsBroken(std::string_view problem) {
@@ -188,7 +186,7 @@ void UnixConnection::end() {
   if (invalidated_) invalidated_();
   interrupted_ = nullptr;
   invalidated_ = nullptr;
-  object_ = nullptr;
+  requestContext_ = nullptr;
   socket_.reset();
 }
 

@@ -6,7 +6,6 @@
 #include <functional>
 #include <memory>
 #include <optional>
-#include <span>
 #include <string>
 #include <string_view>
 
@@ -14,9 +13,11 @@
 #include "platform/Messaging.h"
 #include "platform/linux/descriptors/Epoll.h"
 #include "platform/linux/descriptors/FileDescriptor.h"
-#include "platform/linux/messagepack/RpcFrameReader.h"
+#include "platform/linux/messagepack/RpcFrameScanner.h"
 #include "platform/linux/messaging/RequestWindow.h"
+#include "platform/linux/messaging/Slab.h"
 #include "platform/linux/socket/ReplyOutbox.h"
+#include "platform/linux/socket/UnixRequests.h"
 #include "platform/linux/threads/IoWaker.h"
 
 namespace tonewerk {
@@ -27,8 +28,8 @@ class AllocatorReclaimer;
 struct UnixConnectionContext {
   Epoll& epoll;
   std::shared_ptr<IoWaker> waker;
-  RpcStrings& texts;
-  std::span<char> readBuffer;
+  SlabPool& slabs;
+  std::shared_ptr<RpcFrameDecoder> decoder;
   const LogCategory& log;
   std::uint32_t owner;  // this user and root may call the methods for the daemon's owner
   // Learns how many bytes a client has sent, and when it is gone. May be null.
@@ -37,11 +38,12 @@ struct UnixConnectionContext {
 
 // Serves one client's socket, on the listener's thread.
 //
-//   socket -> readBuffer -> RpcFrameReader -> request handler      as long as there is room for requests
+//   socket -> slab -> RpcFrameScanner -> UnixRequests -> request handler    one object for each read
 //   socket <- ReplyOutbox <- replies of any thread
 //
-// A connection without room for requests is paused: bytes that were read and not used wait in unprocessed_,
-// and the socket is not read.
+// Frames are found here; their values are built where the request handler has them delivered. A connection
+// without room for requests is paused: bytes that were read and not used wait in unprocessed_, and the socket
+// is not read.
 class UnixConnection final : public MessagingConnection {
  public:
   // `context` outlives the connection. `identifier` is its number in the epoll and the waker.
@@ -66,11 +68,12 @@ class UnixConnection final : public MessagingConnection {
 
  private:
   void receive();
-  // Reads frames from `bytes` until the bytes or the room for requests are used up.
-  void process(std::string_view bytes);
-  void dispatch(RpcFrame& frame);
-  [[nodiscard]] std::optional<ReplyError> problemWithFrame(const RpcFrame& frame,
-                                                           std::optional<std::size_t> method) const;
+  // Finds requests in the bytes until the bytes or the room for requests are used up, and passes them on.
+  void process(SlabBytes received);
+  // Finds the next frame's end. Removes the bytes that it has used from the front of `bytes`. A frame that
+  // began in an earlier read is then in begun_.
+  [[nodiscard]] RpcFrameScanner::Result scan(std::string_view& bytes);
+  void passOn(std::unique_ptr<UnixRequests> requests);
   void endAsBroken(std::string_view problem);
   void updateInterest();
   bool hasRoom() { return window_->hasRoom(outbox_->unsentBytes()); }
@@ -81,17 +84,17 @@ class UnixConnection final : public MessagingConnection {
   std::int32_t processIdentifier_ = 0;
   std::uint32_t userIdentifier_ = kNoUser;
 
-  const RequestSet* interface_ = nullptr;
-  std::shared_ptr<RequestHandler> object_;
+  std::shared_ptr<const UnixRequestContext> requestContext_;  // null after the end
   std::function<void()> interrupted_;
   std::function<void()> invalidated_;
   bool isResumed_ = false;
   bool hasEnded_ = false;
 
-  RpcFrameReader reader_;
+  RpcFrameScanner scanner_;
+  std::string begun_;  // the bytes so far of a frame that did not arrive in one read
   std::shared_ptr<RequestWindow> window_;
   bool isPaused_ = false;
-  std::string unprocessed_;
+  SlabBytes unprocessed_;
 
   std::shared_ptr<ReplyOutbox> outbox_;
   // The outbox's state when it was last read. When the peer refuses replies, everything that it has sent is

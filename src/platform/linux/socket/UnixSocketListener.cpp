@@ -12,6 +12,7 @@
 #include <utility>
 
 #include "platform/Log.h"
+#include "platform/linux/messagepack/RpcFrameDecoder.h"
 #include "platform/linux/threads/BatchScope.h"
 
 namespace tonewerk {
@@ -34,8 +35,7 @@ UnixSocketListener::UnixSocketListener(std::unique_ptr<ServerSocket> socket, con
                                        AllocatorReclaimer* memory)
     : socket_(std::move(socket)),
       log_(log),
-      readBuffer_(kReadBytes),
-      context_{epoll_, waker_, texts_, readBuffer_, log_, owner, memory},
+      context_{epoll_, waker_, slabs_, std::make_shared<RpcFrameDecoder>(), log_, owner, memory},
       watchdog_(std::move(watchdog)),
       maxConnections_(descriptorsForClients()) {}
 

@@ -10,11 +10,10 @@
 #include <thread>
 #include <unistd.h>
 #include <unordered_map>
-#include <vector>
 
 #include "platform/Messaging.h"
 #include "platform/linux/descriptors/Epoll.h"
-#include "platform/linux/messagepack/RpcFrameReader.h"
+#include "platform/linux/messaging/Slab.h"
 #include "platform/linux/socket/ServerSocket.h"
 #include "platform/linux/socket/UnixConnection.h"
 #include "platform/linux/system/WatchdogFeeder.h"
@@ -30,7 +29,6 @@ namespace tonewerk {
 // Further clients wait in the socket's backlog.
 class UnixSocketListener final : public MessagingListener {
  public:
-  static constexpr std::size_t kReadBytes = std::size_t{64} * 1024;
   static constexpr std::size_t kReservedDescriptors = 64;
   // When the system has no descriptor for another client, the listener tries again after this time or when a
   // connection has ended.
@@ -79,8 +77,7 @@ class UnixSocketListener final : public MessagingListener {
   // Used by the messaging thread only.
   Epoll epoll_;
   const std::shared_ptr<IoWaker> waker_ = std::make_shared<IoWaker>();
-  RpcStrings texts_;
-  std::vector<char> readBuffer_;
+  SlabPool slabs_;
   const UnixConnectionContext context_;
   const std::unique_ptr<WatchdogFeeder> watchdog_;  // null without a watchdog
   const std::size_t maxConnections_;

@@ -29,8 +29,7 @@ bool BatchScope::defer(std::shared_ptr<Deferred> deferred) {
 }
 
 void BatchScope::pieceHasRun() {
-  assert(currentBatch == this);
-  if (++pieces_ >= kMaxPieces) end();
+  if (currentBatch != nullptr && ++currentBatch->pieces_ >= kMaxPieces) currentBatch->end();
 }
 
 void BatchScope::end() {

@@ -31,8 +31,9 @@ class BatchScope {
   // Defers `deferred` to the end of the calling thread's batch. False when the thread has no batch.
   [[nodiscard]] static bool defer(std::shared_ptr<Deferred> deferred);
 
-  // Call it after each piece of work. After kMaxPieces it ends the batch and begins the next one.
-  void pieceHasRun();
+  // Call it after each piece of work. After kMaxPieces it ends the calling thread's batch and begins the next
+  // one. Does nothing on a thread without a batch.
+  static void pieceHasRun();
 
  private:
   void end();

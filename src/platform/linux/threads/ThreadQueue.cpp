@@ -58,13 +58,13 @@ void ThreadQueue::run() {
                                                                        : kUtilityNiceness);
   std::vector<Task> batch;
   while (waitForWork(batch)) {
-    BatchScope scope;
+    const BatchScope scope;
     for (Task& next : batch) {
       {
         const Task work = std::move(next);  // destroyed before the next piece of work runs
         work();
       }
-      scope.pieceHasRun();
+      BatchScope::pieceHasRun();
     }
     batch.clear();
     if (batch.capacity() > kMaxKeptCapacity) std::vector<Task>().swap(batch);

@@ -1,0 +1,90 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/socket/UnixRequests.h"
+
+#include <cassert>
+#include <utility>
+
+#include "platform/linux/messagepack/RpcFrameDecoder.h"
+#include "platform/linux/threads/BatchScope.h"
+#include "values/ShortenedText.h"
+
+namespace tonewerk {
+namespace {
+
+// How much of an unknown method's name is repeated in the answer.
+constexpr std::size_t kMaxMethodNameBytes = 64;
+
+std::string problemText(const Method& method, const RefusedValue& refused) {
+  std::string text = std::string(method.name) + ": argument " + std::to_string(refused.argument + 1);
+  if (refused.argument < method.parameters.size()) {
+    text += " (" + std::string(method.parameters[refused.argument].name) + ")";
+  }
+  return text + " " + refused.what;
+}
+
+}  // namespace
+
+UnixRequests::UnixRequests(std::shared_ptr<const UnixRequestContext> context,
+                           std::shared_ptr<const Slab> slab)
+    : context_(std::move(context)), slab_(std::move(slab)) {}
+
+UnixRequests::~UnixRequests() {
+  for (; delivered_ < requests_.size(); ++delivered_) {
+    context_->window->finished(bytesOf(requests_[delivered_]));
+  }
+}
+
+void UnixRequests::add(const RpcFrameScanner::Frame& frame, std::string_view bytes,
+                       std::optional<std::size_t> method) {
+  requests_.push_back({bytes, frame.identifier, frame.isNotification, method});
+  context_->window->begin(bytesOf(requests_.back()));
+}
+
+void UnixRequests::addFirst(const RpcFrameScanner::Frame& frame, std::string bytes,
+                            std::optional<std::size_t> method) {
+  assert(empty());
+  first_ = std::move(bytes);
+  add(frame, first_, method);
+}
+
+void UnixRequests::deliver() { deliver(*context_->decoder); }
+
+void UnixRequests::deliverAtOnce() {
+  RpcFrameDecoder decoder;  // the shared one may be in use
+  deliver(decoder);
+}
+
+void UnixRequests::deliver(RpcFrameDecoder& decoder) {
+  while (delivered_ < requests_.size()) {
+    deliver(requests_[delivered_++], decoder);
+    BatchScope::pieceHasRun();
+  }
+}
+
+void UnixRequests::deliver(const Request& request, RpcFrameDecoder& decoder) {
+  InFlightToken token(context_->window, bytesOf(request));
+  Reply reply = request.isNotification ? Reply() : Reply(context_->outbox, request.identifier);
+  RpcFrame& frame = decoder.decode(request.bytes);
+  if (const auto problem = problemWith(request, frame)) return reply(problem);
+  context_->handler->handleRequest(*request.method, std::move(frame.arguments), std::move(reply),
+                                   std::move(token));
+}
+
+std::optional<ReplyError> UnixRequests::problemWith(const Request& request, const RpcFrame& frame) const {
+  if (!request.method) {
+    return messagingError(kUnknownMethod,
+                          "unknown method " + std::string(shortened(frame.method, kMaxMethodNameBytes)));
+  }
+  const Method& known = context_->methods.methods[*request.method];
+  if (auto problem = problemWithCaller(known, context_->user, context_->owner)) return problem;
+  if (frame.refused) return messagingError(kInvalidArguments, problemText(known, *frame.refused));
+  std::optional<std::string> problem = tonewerk::problemWith(known, frame.arguments);
+  return problem ? std::optional(messagingError(kInvalidArguments, std::move(*problem))) : std::nullopt;
+}
+
+std::size_t UnixRequests::bytesOf(const Request& request) const {
+  return request.bytes.size() +
+         (request.method ? context_->methods.methods[*request.method].replyBytes : std::size_t{0});
+}
+
+}  // namespace tonewerk

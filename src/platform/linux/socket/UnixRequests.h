@@ -1,0 +1,77 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "platform/RequestHandler.h"
+#include "platform/linux/messagepack/RpcFrameScanner.h"
+#include "platform/linux/messaging/RequestWindow.h"
+#include "platform/linux/messaging/Slab.h"
+#include "platform/linux/socket/ReplyOutbox.h"
+
+namespace tonewerk {
+
+class RpcFrameDecoder;
+struct RpcFrame;
+
+// What the requests of one connection share. They may outlive the connection.
+struct UnixRequestContext {
+  const RequestSet& methods;
+  std::shared_ptr<RequestHandler> handler;
+  std::shared_ptr<RpcFrameDecoder> decoder;
+  std::shared_ptr<ReplyOutbox> outbox;
+  std::shared_ptr<RequestWindow> window;
+  std::uint32_t user;
+  std::uint32_t owner;  // this user and root may call the methods for the daemon's owner
+};
+
+// The requests of one read from a client's socket: their bytes, and where each one is. The messaging thread
+// adds them; then they are delivered, mostly on another thread.
+class UnixRequests final : public ReceivedRequests {
+ public:
+  // `bytes` are those of one read. The requests that are added lie in them or in a text of their own.
+  UnixRequests(std::shared_ptr<const UnixRequestContext> context, std::shared_ptr<const Slab> slab);
+  UnixRequests(const UnixRequests&) = delete;
+  UnixRequests& operator=(const UnixRequests&) = delete;
+  // Requests that were not delivered count as finished.
+  ~UnixRequests() override;
+
+  bool empty() const { return requests_.empty(); }
+  // Adds a request. `bytes` are the whole frame, in the slab; `method` is its index in the request set, none
+  // for an unknown one.
+  void add(const RpcFrameScanner::Frame& frame, std::string_view bytes, std::optional<std::size_t> method);
+  // Adds the first request, whose bytes came with several reads.
+  void addFirst(const RpcFrameScanner::Frame& frame, std::string bytes, std::optional<std::size_t> method);
+
+  void deliver() override;
+  // Delivers on the messaging thread, while another thread may deliver other requests of the same listener.
+  void deliverAtOnce();
+
+ private:
+  struct Request {
+    std::string_view bytes;
+    std::uint32_t identifier;
+    bool isNotification;
+    std::optional<std::size_t> method;
+  };
+
+  void deliver(RpcFrameDecoder& decoder);
+  void deliver(const Request& request, RpcFrameDecoder& decoder);
+  [[nodiscard]] std::optional<ReplyError> problemWith(const Request& request, const RpcFrame& frame) const;
+  // The bytes that the request counts for in the window.
+  std::size_t bytesOf(const Request& request) const;
+
+  const std::shared_ptr<const UnixRequestContext> context_;
+  const std::shared_ptr<const Slab> slab_;
+  std::string first_;
+  std::vector<Request> requests_;
+  std::size_t delivered_ = 0;
+};
+
+}  // namespace tonewerk
