@@ -68,7 +68,7 @@ void TWReportingClientServerInstance::createReportingSession(ReporterID reporter
     // An earlier session with this identifier is dropped without a stop, because its client has given it up.
     const Session session = self.makeSession(reporterID);
     session->setClientProcessName(self.clientProcessName());
-    sessions[reporterID] = session;
+    self.setSession(reporterID, session);
     infoLog(category(), "session created for reporter %lli", reporterID);
     reply(std::nullopt, true);
   });
@@ -100,7 +100,7 @@ void TWReportingClientServerInstance::changeServiceType(AudioServiceType service
   (void)replacement->updateConfigurationWithContentsOfConfiguration(&configuration);
   replacement->addPreviousValues(previousValues);
   replacement->setServiceType(serviceType);
-  clientReportingSessionMap_[session->reporterID()] = replacement;
+  setSession(session->reporterID(), replacement);
 }
 
 void TWReportingClientServerInstance::getServiceNameForReporterID(ReporterID reporterID,
@@ -170,16 +170,16 @@ void TWReportingClientServerInstance::sendMessage(ValueMap message, AudioEventCa
                 if (!delegate.isReportingEnabled()) {
                   return reply(ReplyError{std::string(kReportingErrorDomain), kReportingDisabled, ""});
                 }
-                const std::vector<Session> sessions = delegate.findReportingSessionsForIDs(reporterIDs);
-                for (std::size_t at = 0; at < sessions.size(); ++at) {
-                  ValueMap payload = message;
-                  // The last session then holds the only reference and can change the message without a copy.
-                  if (at + 1 == sessions.size()) message = ValueMap();
+                const auto send = [&](const Session& session, ValueMap payload) {
                   const auto record =
                       std::make_shared<TWReportingSessionMessage>(std::move(payload), messageCategory, type);
-                  sessions[at]->sendMessage(record);
-                  delegate.messageTap().note(*sessions[at], *record);
-                }
+                  session->sendMessage(record);
+                  delegate.messageTap().note(*session, *record);
+                };
+                std::vector<Session> sessions = delegate.findReportingSessionsForIDs(reporterIDs);
+                // The last session gets the only reference and can change the message without a copy.
+                for (std::size_t at = 0; at + 1 < sessions.size(); ++at) send(sessions[at], message);
+                if (!sessions.empty()) send(sessions.back(), std::move(message));
                 reply(std::nullopt);
               });
 }
@@ -215,7 +215,7 @@ void TWReportingClientServerInstance::destroyReportingSession(ReporterID reporte
     if (reporterID == 0) return reply(std::nullopt, true);
     if (const Session session = self.ownSession(reporterID)) {
       if (session->started()) session->stop();
-      self.clientReportingSessionMap_.erase(reporterID);
+      self.removeSession(reporterID);
     }
     debugLog(category(), "destroying %lli", reporterID);
     delegate.logReportingSessions();
@@ -288,11 +288,31 @@ void TWReportingClientServerInstance::handleConnectionError() {
     for (const auto& [reporterID, session] : self->clientReportingSessionMap_) {
       if (session->started()) session->stop();
     }
-    self->clientReportingSessionMap_.clear();
+    while (!self->clientReportingSessionMap_.empty()) {
+      self->removeSession(self->clientReportingSessionMap_.begin()->first);
+    }
     delegate->removeClient(*self);
     logLine(self->connectionLogLevel(), category(), "removing %i from the server client list",
             self->processIdentifier_);
   });
+}
+
+void TWReportingClientServerInstance::listSessionsIn(std::shared_ptr<SessionIndex> index,
+                                                     SessionIndex::ClientNumber number) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
+  assert(clientReportingSessionMap_.empty());
+  index_ = std::move(index);
+  number_ = number;
+}
+
+void TWReportingClientServerInstance::setSession(ReporterID reporterID, Session session) {
+  if (index_ != nullptr) index_->set(reporterID, number_, session);
+  clientReportingSessionMap_[reporterID] = std::move(session);
+}
+
+void TWReportingClientServerInstance::removeSession(ReporterID reporterID) {
+  if (index_ != nullptr) index_->remove(reporterID, number_);
+  clientReportingSessionMap_.erase(reporterID);
 }
 
 const TWReportingClientServerInstance::SessionMap&

@@ -11,6 +11,7 @@
 
 #include "platform/Log.h"
 #include "protocol/AudioEvent.h"
+#include "service/SessionIndex.h"
 #include "service/TWReportingServiceProtocol.h"
 #include "session/KeptBytesBudget.h"
 #include "values/Mutex.h"
@@ -78,11 +79,14 @@ class TWReportingClientServerInstance final
 
   const SessionMap& clientReportingSessionMap() const;
 
+  // From now on keeps the client's sessions in `index`, under `number`. Called once, before the first request.
+  void listSessionsIn(std::shared_ptr<SessionIndex> index, SessionIndex::ClientNumber number);
+
  private:
   using Delegate = std::shared_ptr<TWReportingServiceDelegateProtocol>;
   using Session = std::shared_ptr<TWReportingSession>;
 
-  // Queues `body` on the work queue. It is called with this object, the delegate and the reply.
+  // Runs `body` with this object, the delegate and the reply: at once on the work queue, else queued there.
   template <typename Body>
   void onWorkQueue(ServiceRequest request, Body body);
 
@@ -91,11 +95,16 @@ class TWReportingClientServerInstance final
   Session ownSession(ReporterID reporterID) const;
   Session makeSession(ReporterID reporterID) const;
   void changeServiceType(AudioServiceType serviceType, const Session& session);
+  // Sets and removes a session in the client's map and in the index of all clients' sessions.
+  void setSession(ReporterID reporterID, Session session);
+  void removeSession(ReporterID reporterID);
 
   const std::int32_t processIdentifier_;
   const std::weak_ptr<TWReportingServiceDelegateProtocol> delegate_;
   const std::shared_ptr<KeptBytesBudget> budget_;
   SessionMap clientReportingSessionMap_;
+  std::shared_ptr<SessionIndex> index_;  // null until the service has registered the client
+  SessionIndex::ClientNumber number_ = 0;
   std::atomic<bool> isOnlooker_ = false;
 
   mutable Mutex mutex_;

@@ -88,6 +88,7 @@ MessageTap& TWReportingService::messageTap() {
 
 void TWReportingService::registerClient(const Client& client) {
   clients_.push_back(client);
+  client->listSessionsIn(sessionIndex_, ++lastClientNumber_);
   client->setClientStartDate(now());
   client->setClientProcessName(
       TWReportingContext::current().platform().processes.processName(client->processIdentifier()));
@@ -109,16 +110,14 @@ TWReportingService::Session TWReportingService::findReportingSessionForID(Report
   assert(TWReportingUtilityIsOnReportingServerQueue());
   const MutexLock lock(mutex_);
   if (reporterID == 0 || !reportingEnabled_) return nullptr;
-  for (const Client& client : clients_) {
-    const auto& sessions = client->clientReportingSessionMap();
-    const auto found = sessions.find(reporterID);
-    if (found == sessions.end()) continue;
-    infoLog(category(), "found reporting session %lli for client %i", reporterID,
-            client->processIdentifier());
-    return found->second;
+  Session session = sessionIndex_->find(reporterID);
+  if (session == nullptr) {
+    errorLog(category(), "failed to find reporting session %lli", reporterID);
+    return nullptr;
   }
-  errorLog(category(), "failed to find reporting session %lli", reporterID);
-  return nullptr;
+  infoLog(category(), "found reporting session %lli for client %i", reporterID,
+          session->processIdentifiers().front());
+  return session;
 }
 
 std::vector<TWReportingService::Session> TWReportingService::getAllActiveReportingSessions() {

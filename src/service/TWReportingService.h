@@ -10,6 +10,7 @@
 #include "platform/Messaging.h"
 #include "platform/TimerService.h"
 #include "service/MessageTap.h"
+#include "service/SessionIndex.h"
 #include "service/TWReportingServiceDelegateProtocol.h"
 #include "values/Mutex.h"
 
@@ -69,8 +70,11 @@ class TWReportingService final : public MessagingListenerDelegate,
 
   const std::function<void()> endProcess_;
   std::atomic<bool> reportingEnabled_ = true;
-  std::vector<Client> clients_;  // in order of connection; used on the work queue
-  MessageTap messageTap_;        // used on the work queue
+  std::vector<Client> clients_;                      // in order of connection; used on the work queue
+  SessionIndex::ClientNumber lastClientNumber_ = 0;  // used on the work queue
+  // The sessions of all clients. Shared with clients that may outlive the service.
+  const std::shared_ptr<SessionIndex> sessionIndex_ = std::make_shared<SessionIndex>();
+  MessageTap messageTap_;  // used on the work queue
 
   Mutex mutex_;  // held while a client is made and while a session is searched for; guards no member
 
