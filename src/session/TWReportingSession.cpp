@@ -52,7 +52,8 @@ TWReportingSession::TWReportingSession(Private, ReporterID reporterID, ProcessId
     : reporterID_(reporterID),
       processIdentifiers_(std::move(processIdentifiers)),
       budget_(std::move(budget)),
-      serviceName_(TWReportingUtilityGenerateServiceNameFromServiceType(kServiceUnknown)) {}
+      serviceName_(TWReportingUtilityGenerateServiceNameFromServiceType(kServiceUnknown)),
+      applicationName_(TWReportingUtilityRetrieveAppName({})) {}
 
 TWReportingSession::~TWReportingSession() {
   logUnkeptCount();
@@ -91,7 +92,9 @@ bool TWReportingSession::updateConfigurationWithContentsOfConfiguration(const Va
   }
   update.merge(*configuration);
   const MutexLock lock(propertiesMutex_);
-  return mergeWithinBudget(configuration_, update);
+  if (!mergeWithinBudget(configuration_, update)) return false;
+  applicationName_ = TWReportingUtilityRetrieveAppName(configuration_);
+  return true;
 }
 
 void TWReportingSession::start() {
@@ -151,7 +154,8 @@ void TWReportingSession::makeWorker(const TWReportingSessionWorkerClass& workerC
     if (workerClass.isProducer) producingMessageWorkers_.push_back(worker);
   }
   if (workerClass.isConsumer) {
-    consumers_.push_back(std::dynamic_pointer_cast<TWReportingSessionWorkerConsumerProtocol>(worker));
+    auto& consumer = dynamic_cast<TWReportingSessionWorkerConsumerProtocol&>(*worker);
+    consumers_.push_back({&consumer, &consumer.workerClass(), consumer.handleRedundantMessages()});
   }
   debugLog(TWReportingSessionCategory(), "TWReportingSessionWorker action=added worker=%@ reporterID=%lli",
            workerClass, reporterID_);
@@ -198,11 +202,9 @@ void TWReportingSession::sendMessage(const std::shared_ptr<TWReportingSessionMes
   message->isSessionStarted = started_;
   message->isRedundant = messageIsRedundant(*message);
   if (message->isRedundant) ++redundantMessageCount_;
-  debugLog(
-      TWReportingSessionCategory(),
-      "TWReportingSessionWorker action=sendMessage reporterID=%lli app=%@ redundant=%@ message=%@",
-      reporterID_, [&] { return TWReportingUtilityRetrieveAppName(configuration()).string(); },
-      yesOrNo(message->isRedundant), *message);
+  debugLog(TWReportingSessionCategory(),
+           "TWReportingSessionWorker action=sendMessage reporterID=%lli app=%@ redundant=%@ message=%@",
+           reporterID_, applicationName_, yesOrNo(message->isRedundant), *message);
   addPreviousValues(message->message);
   if (!message->isRedundant && !store(message)) ++unkeptMessageCount_;
   deliver(*message);
@@ -212,12 +214,12 @@ void TWReportingSession::sendMessage(const std::shared_ptr<TWReportingSessionMes
 void TWReportingSession::deliver(const TWReportingSessionMessage& message) {
   // By index, because a worker that sends or starts the session may add consumers.
   for (std::size_t at = 0; at < consumers_.size(); ++at) {
-    const Consumer worker = consumers_[at];
-    if (!worker->started) continue;
-    if (message.isRedundant && !worker->handleRedundantMessages()) continue;
-    const TWReportingSessionWorkerClass& workerClass = worker->workerClass();
+    const Consumer consumer = consumers_[at];
+    if (!consumer.worker->started) continue;
+    if (message.isRedundant && !consumer.handlesRedundantMessages) continue;
+    const TWReportingSessionWorkerClass& workerClass = *consumer.workerClass;
     if (!message.destinationWorkers.empty() && !contains(message.destinationWorkers, workerClass)) continue;
-    worker->handleMessage(message);
+    if (workerClass.handledTypes.contains(message.type)) consumer.worker->handleMessage(message);
     debugLog(TWReportingSessionCategory(),
              "TWReportingSessionWorker action=handleMessage worker=%@ reporterID=%lli", workerClass,
              reporterID_);
@@ -350,7 +352,7 @@ void TWReportingSession::addAppName(TWReportingSessionMessage& message) const {
   const std::lock_guard lock(message);
   const Value* name = message.message.find(TWReportingApplicationName);
   if (name != nullptr && !(*name == kUnknownName)) return;
-  message.message.set(TWReportingApplicationName, TWReportingUtilityRetrieveAppName(configuration()));
+  message.message.set(TWReportingApplicationName, applicationName_);
 }
 
 bool TWReportingSession::messageIsRedundant(const TWReportingSessionMessage& message) const {

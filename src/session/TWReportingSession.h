@@ -125,7 +125,12 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   TransactionCompleteBlock transactionCompleteBlock;
 
  private:
-  using Consumer = std::shared_ptr<TWReportingSessionWorkerConsumerProtocol>;
+  // One of consumingMessageWorkers_, with what does not change about it.
+  struct Consumer {
+    TWReportingSessionWorkerConsumerProtocol* worker;
+    const TWReportingSessionWorkerClass* workerClass;
+    bool handlesRedundantMessages;
+  };
   enum class Order { kConsumersFirst, kProducersFirst };
 
   std::shared_ptr<TWReportingSessionMessage> lifecycleMessage(AudioEventType type,
@@ -163,7 +168,8 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   std::map<std::pair<AudioEventCategory, AudioEventType>, const TWReportingSessionMessage*> newest_;
   std::size_t messageBytes_ = 0;          // taken from the budget for messages_
   std::uint64_t unkeptMessageCount_ = 0;  // delivered but not stored for lack of room, and not logged yet
-  std::vector<Consumer> consumers_;       // consumingMessageWorkers_ as consumers
+  std::vector<Consumer> consumers_;       // in the order of consumingMessageWorkers_, which own them
+  SharedString applicationName_;          // the one of configuration_
 
   // The properties that any thread may read. Only the work queue writes them.
   mutable Mutex propertiesMutex_;

@@ -2,16 +2,36 @@
 #pragma once
 
 #include <concepts>
+#include <cstdint>
 #include <memory>
 #include <string>
 #include <string_view>
 #include <type_traits>
 
+#include "protocol/AudioEvent.h"
 #include "session/TWReportingSessionWorkerConsumerProtocol.h"
 #include "session/TWReportingSessionWorkerProducerProtocol.h"
 #include "session/TWReportingSessionWorkerProtocol.h"
 
 namespace tonewerk {
+
+// A set of message types. The numbers from 63 on, which are not types, or mean an unknown one, are in it together
+// or not at all.
+class MessageTypes {
+ public:
+  static constexpr MessageTypes all() { return MessageTypes(~std::uint64_t{0}); }
+  static constexpr MessageTypes only(AudioEventType type) { return MessageTypes(bitOf(type)); }
+
+  constexpr bool contains(AudioEventType type) const { return (bits_ & bitOf(type)) != 0; }
+
+ private:
+  explicit constexpr MessageTypes(std::uint64_t bits) : bits_(bits) {}
+  static constexpr std::uint64_t bitOf(AudioEventType type) {
+    return std::uint64_t{1} << (type < 63 ? type : 63);
+  }
+
+  std::uint64_t bits_;
+};
 
 // Describes a worker class for the registry. Each class has one object of this type, whose address
 // identifies it.
@@ -26,6 +46,8 @@ struct TWReportingSessionWorkerClass {
   // Makes a worker; returns null when the worker does not apply to the session. A null pointer for a class
   // whose workers cannot be made.
   Worker (*initWithSession)(const std::shared_ptr<TWReportingSession>& session);
+  // The types of messages with which a consumer of this class does something.
+  MessageTypes handledTypes = MessageTypes::all();
 
   std::string description() const { return std::string(name); }
 };
@@ -42,6 +64,12 @@ template <typename T>
 constexpr bool handlesSingleMessageSession() {
   if constexpr (requires { T::handleSingleMessageSession(); }) return T::handleSingleMessageSession();
   return false;
+}
+
+template <typename T>
+constexpr MessageTypes handledTypes() {
+  if constexpr (requires { T::kHandledTypes; }) return T::kHandledTypes;
+  return MessageTypes::all();
 }
 
 using Session = std::shared_ptr<TWReportingSession>;
@@ -77,7 +105,8 @@ constexpr TWReportingSessionWorkerClass workerClassOf(std::string_view name) {
           std::is_base_of_v<TWReportingSessionWorkerConsumerProtocol, T>,
           worker_class_detail::startsOnInit<T>(),
           worker_class_detail::handlesSingleMessageSession<T>(),
-          worker_class_detail::maker<T>()};
+          worker_class_detail::maker<T>(),
+          worker_class_detail::handledTypes<T>()};
 }
 
 }  // namespace tonewerk

@@ -463,6 +463,45 @@ TEST_F(RedundancyTest, AfterTheSortAtStopTheNewestIsTheLatestByTime) {
 
 // Workers.
 
+// Handles errors only.
+class ErrorConsumer final : public TWReportingSessionWorkerConsumerProtocol {
+ public:
+  static const TWReportingSessionWorkerClass kWorkerClass;
+  static constexpr MessageTypes kHandledTypes = MessageTypes::only(kTypeError);
+  const TWReportingSessionWorkerClass& workerClass() const override { return kWorkerClass; }
+  explicit ErrorConsumer(const std::shared_ptr<TWReportingSession>& owner) { session = owner; }
+  bool handleMessage(const TWReportingSessionMessage& message) override {
+    handled.push_back(message.type);
+    return false;
+  }
+
+  std::vector<AudioEventType> handled;
+};
+const TWReportingSessionWorkerClass ErrorConsumer::kWorkerClass =
+    workerClassOf<ErrorConsumer>("ErrorConsumer");
+
+TEST_F(RedundancyTest, AConsumerGetsOnlyMessagesOfTheTypesThatItHandles) {
+  useWorkers({&ErrorConsumer::kWorkerClass});
+  session = makeSession();
+  session->start();
+  for (const AudioEventType type : {kTypeStart, kTypeError, kTypeUnknown, kTypeError}) {
+    session->sendMessage(messageAt(test.clock.now(), {{"a", 1}}, 4, type));
+  }
+  const auto& worker = dynamic_cast<const ErrorConsumer&>(*session->consumingMessageWorkers().front());
+  EXPECT_THAT(worker.handled, ElementsAre(kTypeError, kTypeError));
+}
+
+TEST(MessageTypesTest, HoldsEachTypeByItself) {
+  for (AudioEventType held = 0; held < 63; ++held) {
+    for (AudioEventType type = 0; type < 63; ++type) {
+      EXPECT_EQ(MessageTypes::only(held).contains(type), type == held);
+    }
+    EXPECT_FALSE(MessageTypes::only(held).contains(kTypeUnknown));
+    EXPECT_TRUE(MessageTypes::all().contains(held));
+  }
+  EXPECT_TRUE(MessageTypes::all().contains(kTypeUnknown));
+}
+
 class WorkerTest : public ReportingTest {
  protected:
   WorkerTest() : ReportingTest(testWorkerClasses()) {}

@@ -15,6 +15,7 @@ class TWReportingSessionMemoryLogWorker final : public TWReportingSessionWorkerC
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
   const TWReportingSessionWorkerClass& workerClass() const override { return kWorkerClass; }
+  static constexpr MessageTypes kHandledTypes = MessageTypes::only(kTypeMemoryLog);
   static constexpr bool startOnInit() { return true; }
 
   [[nodiscard]] static std::shared_ptr<TWReportingSessionMemoryLogWorker> initWithSession(

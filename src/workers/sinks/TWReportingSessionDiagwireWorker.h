@@ -12,6 +12,7 @@ class TWReportingSessionDiagwireWorker final : public TWReportingSessionWorkerCo
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
   const TWReportingSessionWorkerClass& workerClass() const override { return kWorkerClass; }
+  static constexpr MessageTypes kHandledTypes = MessageTypes::only(kTypeIssueDetector);
   static constexpr bool startOnInit() { return true; }
   static constexpr bool handleSingleMessageSession() { return true; }
 

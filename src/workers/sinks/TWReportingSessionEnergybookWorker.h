@@ -14,6 +14,7 @@ class TWReportingSessionEnergybookWorker final : public TWReportingSessionWorker
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
   const TWReportingSessionWorkerClass& workerClass() const override { return kWorkerClass; }
+  static constexpr MessageTypes kHandledTypes = MessageTypes::only(kTypeEnergybook);
   static constexpr bool startOnInit() { return true; }
   static constexpr bool handleSingleMessageSession() { return true; }
 
