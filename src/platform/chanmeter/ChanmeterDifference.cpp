@@ -45,15 +45,15 @@ void subtractBuckets(std::vector<ChanmeterBucket>& buckets, const std::vector<Ch
   }
 }
 
-std::shared_ptr<const ChanmeterRecord> differenceOf(const ChanmeterRecord& earlier,
-                                                    const std::shared_ptr<const ChanmeterRecord>& later) {
-  if (later->format < kChanmeterFormatSimple || later->format > kChanmeterFormatHistogram) return later;
-  auto change = std::make_shared<ChanmeterRecord>(*later);
-  if (change->format == kChanmeterFormatSimple)
-    change->value = saturatingDifference(later->value, earlier.value);
-  if (change->format == kChanmeterFormatState) subtractStates(change->states, earlier.states);
-  if (change->format == kChanmeterFormatHistogram) subtractBuckets(change->buckets, earlier.buckets);
-  return change;
+bool hasDifference(const ChanmeterRecord& record) {
+  return record.format >= kChanmeterFormatSimple && record.format <= kChanmeterFormatHistogram;
+}
+
+void subtract(ChanmeterRecord& change, const ChanmeterRecord& earlier) {
+  if (change.format == kChanmeterFormatSimple)
+    change.value = saturatingDifference(change.value, earlier.value);
+  if (change.format == kChanmeterFormatState) subtractStates(change.states, earlier.states);
+  if (change.format == kChanmeterFormatHistogram) subtractBuckets(change.buckets, earlier.buckets);
 }
 
 }  // namespace
@@ -62,10 +62,20 @@ ChanmeterRecords chanmeterDifference(const ChanmeterRecords& earlier, const Chan
   const auto before = counterparts(earlier, later, [](const std::shared_ptr<const ChanmeterRecord>& record) {
     return std::tie(record->key, record->format);
   });
+  // All changes are in one allocation, which each of them keeps alive.
+  const auto all = std::make_shared<std::vector<ChanmeterRecord>>();
+  all->reserve(later.size());
   ChanmeterRecords changes;
   changes.reserve(later.size());
   for (std::size_t i = 0; i < later.size(); ++i) {
-    if (before[i] != nullptr) changes.push_back(differenceOf(**before[i], later[i]));
+    if (before[i] == nullptr) continue;
+    if (hasDifference(*later[i])) {
+      ChanmeterRecord& change = all->emplace_back(*later[i]);
+      subtract(change, **before[i]);
+      changes.emplace_back(all, &change);
+    } else {
+      changes.push_back(later[i]);
+    }
   }
   return changes;
 }

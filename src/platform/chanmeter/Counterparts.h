@@ -19,6 +19,7 @@ std::vector<const T*> counterparts(const std::vector<T>& earlier, const std::vec
   std::size_t begin = 0;
   for (; begin < shorter && keyOf(earlier[begin]) == keyOf(later[begin]); ++begin)
     found[begin] = &earlier[begin];
+  if (begin == later.size()) return found;
 
   const auto sortedRest = [&](const std::vector<T>& items) {
     std::vector<const T*> rest;
