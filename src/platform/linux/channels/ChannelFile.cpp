@@ -5,6 +5,7 @@
 #include <cmath>
 #include <concepts>
 #include <memory>
+#include <type_traits>
 #include <utility>
 
 #include "platform/linux/channels/ChannelFailures.h"
@@ -13,8 +14,12 @@
 namespace tonewerk {
 namespace {
 
+using Field = ChannelNumbers::Field;
 using Node = JsonTree::Node;
 using Kind = JsonTree::Kind;
+
+// Arrays may be long and wrong, so no more is reserved for them in advance.
+constexpr std::size_t kMaxReserved = 4096;
 
 // The position of a value in the file. It lives on the stack, and is converted into a text only for an error.
 struct Place {
@@ -29,50 +34,74 @@ struct Place {
   }
 };
 
+// What all readers of a file share.
+struct Reading {
+  const JsonTree& json;
+  ChannelFileProblem& problem;
+  std::vector<ChannelNumbers::Use> numbers = {};  // that were read into records
+};
+
 // Reads the fields of one JSON object. Each function returns false, and sets the problem, if its field does
 // not have the right form.
 class ObjectReader {
  public:
-  ObjectReader(const JsonTree& json, const Node& node, const Place& place, ChannelFileProblem& problem)
-      : json_(json), node_(node), place_(place), problem_(problem) {}
+  // `record` and `element` say whose numbers the object has.
+  ObjectReader(Reading& reading, const Node& node, const Place& place, std::size_t record = 0,
+               std::size_t element = 0)
+      : reading_(reading), node_(node), place_(place), record_(record), element_(element) {}
 
   bool isObject() { return node_.kind == Kind::kObject || fail(kChannelsWrongType, place_, "is no object"); }
 
-  // The second overload is for fields that may be missing.
+  // The second overload is for fields that may be missing. `target` is the field of the record that gets a
+  // number.
   template <typename T>
-  bool read(const char* key, T& value) {
-    const Node* field = json_.field(node_, key);
+  bool read(const char* key, T& value, Field target = Field::kIgnored) {
+    const Node* field = reading_.json.field(node_, key);
     if (field == nullptr) return fail(kChannelsFieldMissing, {&place_, key}, "is missing");
-    return convert(*field, {&place_, key}, value);
+    return take(*field, {&place_, key}, value, target);
   }
   template <typename T>
-  bool read(const char* key, std::optional<T>& value) {
-    const Node* field = json_.field(node_, key);
-    return field == nullptr || convert(*field, {&place_, key}, value.emplace());
+  bool read(const char* key, std::optional<T>& value, Field target = Field::kIgnored) {
+    const Node* field = reading_.json.field(node_, key);
+    return field == nullptr || take(*field, {&place_, key}, value.emplace(), target);
   }
 
   // Calls `readElement(reader, element)` for each object of an array.
   template <typename T, typename ReadElement>
   bool readList(const char* key, std::vector<T>& list, ReadElement readElement) {
-    const Node* field = json_.field(node_, key);
+    const Node* field = reading_.json.field(node_, key);
     const Place place{&place_, key};
     if (field == nullptr) return fail(kChannelsFieldMissing, place, "is missing");
     if (field->kind != Kind::kArray) return fail(kChannelsWrongType, place, "is no array");
     list.clear();
-    list.reserve(field->count);
+    list.reserve(std::min<std::size_t>(field->count, kMaxReserved));
     for (const Node* one = JsonTree::first(*field); one != JsonTree::end(*field);
          one = JsonTree::next(*one)) {
       const Place elementPlace{&place, nullptr, list.size()};
-      ObjectReader reader(json_, *one, elementPlace, problem_);
+      const bool isRecord = place_.parent == nullptr;
+      ObjectReader reader(reading_, *one, elementPlace, isRecord ? list.size() : record_,
+                          isRecord ? 0 : list.size());
       if (!reader.isObject() || !readElement(reader, list.emplace_back())) return false;
     }
     return true;
   }
 
  private:
+  template <typename T>
+  bool take(const Node& field, const Place& place, T& value, Field target) {
+    if (!convert(field, place, value)) return false;
+    if constexpr (std::is_arithmetic_v<T>) {
+      reading_.numbers.push_back({&field,
+                                  {.record = static_cast<std::uint32_t>(record_),
+                                   .element = static_cast<std::uint32_t>(element_),
+                                   .field = target}});
+    }
+    return true;
+  }
+
   bool convert(const Node& field, const Place& place, std::string& text) {
     if (field.kind != Kind::kText) return fail(kChannelsWrongType, place, "is no text");
-    text = json_.textOf(field);
+    text = reading_.json.textOf(field);
     return true;
   }
 
@@ -96,9 +125,9 @@ class ObjectReader {
   bool convert(const Node& field, const Place& place, T& number) {
     switch (field.kind) {
       case Kind::kInteger:
-        return take(field.integer, place, number);
+        return narrow(field.integer, place, number);
       case Kind::kUnsigned:
-        return take(field.unsignedInteger, place, number);
+        return narrow(field.unsignedInteger, place, number);
       case Kind::kDouble: {
         // The JSON reader turns an integer beyond 64 bits into a double.
         constexpr double kBeyond64Bits = 9223372036854775808.0;
@@ -112,23 +141,24 @@ class ObjectReader {
   }
 
   template <std::integral T>
-  bool take(std::integral auto value, const Place& place, T& number) {
+  bool narrow(std::integral auto value, const Place& place, T& number) {
     if (!std::in_range<T>(value)) return fail(kChannelsOutOfRange, place, "is out of range");
     number = static_cast<T>(value);
     return true;
   }
 
   bool fail(ChannelFailure code, const Place& place, const char* what) {
-    problem_.code = code;
+    reading_.problem.code = code;
     const std::string where = place.text();
-    problem_.text = (where.empty() ? "the file" : where) + " " + what;
+    reading_.problem.text = (where.empty() ? "the file" : where) + " " + what;
     return false;
   }
 
-  const JsonTree& json_;
+  Reading& reading_;
   const Node& node_;
   const Place& place_;
-  ChannelFileProblem& problem_;
+  const std::size_t record_;
+  const std::size_t element_;
 };
 
 ChanmeterFormat formatOf(std::string_view text) {
@@ -141,24 +171,27 @@ ChanmeterFormat formatOf(std::string_view text) {
 }
 
 bool readState(ObjectReader& reader, ChanmeterState& state) {
-  return reader.read("name", state.name) && reader.read("transitions", state.transitions) &&
-         reader.read("residency", state.residency) && reader.read("duty_cycle", state.dutyCycle);
+  return reader.read("name", state.name) &&
+         reader.read("transitions", state.transitions, Field::kTransitions) &&
+         reader.read("residency", state.residency, Field::kResidency) &&
+         reader.read("duty_cycle", state.dutyCycle, Field::kDutyCycle);
 }
 
 // A bound may be missing. The record's user then gets an error when it asks for it.
 bool readBucket(ObjectReader& reader, ChanmeterBucket& bucket) {
-  return reader.read("lower", bucket.lower) && reader.read("upper", bucket.upper) &&
-         reader.read("hits", bucket.hits);
+  return reader.read("lower", bucket.lower, Field::kLower) &&
+         reader.read("upper", bucket.upper, Field::kUpper) && reader.read("hits", bucket.hits, Field::kHits);
 }
 
 bool readValue(ObjectReader& reader, ChanmeterRecord& record) {
   switch (record.format) {
     case kChanmeterFormatSimple:
-      return reader.read("value", record.value);
+      return reader.read("value", record.value, Field::kValue);
     case kChanmeterFormatState:
       return reader.readList("states", record.states, readState);
     case kChanmeterFormatHistogram:
-      return reader.read("min", record.minimum) && reader.read("max", record.maximum) &&
+      return reader.read("min", record.minimum, Field::kMinimum) &&
+             reader.read("max", record.maximum, Field::kMaximum) &&
              reader.readList("buckets", record.buckets, readBucket);
     default:
       return true;
@@ -197,26 +230,46 @@ bool parseJson(std::string_view text, JsonTree& json, ChannelFileProblem& proble
   return false;
 }
 
+using Records = std::vector<ChanmeterRecord>;
+
+// Returns the records one by one; each keeps all of them alive. One allocation instead of one for each.
+ChanmeterRecords oneByOne(const std::shared_ptr<const Records>& all) {
+  ChanmeterRecords records;
+  records.reserve(all->size());
+  for (const ChanmeterRecord& record : *all) records.emplace_back(all, &record);
+  return records;
+}
+
 }  // namespace
 
 std::optional<ChannelFile> ChannelFile::parse(std::string_view text, ChannelFileProblem& problem) {
   JsonTree json;
   if (!parseJson(text, json, problem)) return std::nullopt;
   ChannelFile file;
+  const auto all = std::make_shared<Records>();
   const Place root;
-  ObjectReader reader(json, json.root(), root, problem);
-  const auto readOne = [&](ObjectReader& channel, std::shared_ptr<const ChanmeterRecord>& kept) {
-    auto record = std::make_shared<ChanmeterRecord>();
-    record->key.driver = file.driver;
-    if (!readChannel(channel, *record)) return false;
-    kept = std::move(record);
-    return true;
+  Reading reading{json, problem};
+  ObjectReader reader(reading, json.root(), root);
+  const auto readOne = [&](ObjectReader& channel, ChanmeterRecord& record) {
+    record.key.driver = file.driver;
+    return readChannel(channel, record);
   };
   if (!reader.isObject() || !reader.read("driver", file.driver) ||
-      !reader.readList("channels", file.records, readOne)) {
+      !reader.readList("channels", *all, readOne)) {
     return std::nullopt;
   }
+  file.all_ = all;
+  file.records = oneByOne(all);
+  file.numbers_ = ChannelNumbers(text, json, std::move(reading.numbers));
   return file;
+}
+
+bool ChannelFile::update(std::string_view previous, std::string_view text) {
+  const auto all = std::make_shared<Records>(*all_);
+  if (!numbers_.read(previous, text, *all)) return false;
+  all_ = all;
+  records = oneByOne(all);
+  return true;
 }
 
 }  // namespace tonewerk

@@ -2,11 +2,14 @@
 #pragma once
 
 #include <cstdint>
+#include <memory>
 #include <optional>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "platform/chanmeter/ChanmeterRecord.h"
+#include "platform/linux/channels/ChannelNumbers.h"
 
 namespace tonewerk {
 
@@ -16,7 +19,8 @@ struct ChannelFileProblem {
 };
 
 // Holds the channels that one driver publishes in a JSON file. docs/driver-channels.md describes the format.
-struct ChannelFile {
+class ChannelFile {
+ public:
   // The format of a channel whose "format" field has an unknown text.
   static constexpr ChanmeterFormat kUnsupportedFormat = 255;
 
@@ -26,6 +30,16 @@ struct ChannelFile {
   // None if `text` does not have the right form; `problem` is then the first error. Unknown fields are
   // ignored. If a field is given twice, the last one counts.
   [[nodiscard]] static std::optional<ChannelFile> parse(std::string_view text, ChannelFileProblem& problem);
+
+  // Reads a text that differs from `previous` in its numbers only, which costs a tenth of parsing it.
+  // `previous` is the text of the last successful parse() or update(). The result is that of parse(), with
+  // new records. Returns false if the text differs elsewhere or needs parsing. Then this object must not be
+  // updated again.
+  [[nodiscard]] bool update(std::string_view previous, std::string_view text);
+
+ private:
+  std::shared_ptr<const std::vector<ChanmeterRecord>> all_;  // what `records` point into
+  ChannelNumbers numbers_;
 };
 
 }  // namespace tonewerk
