@@ -116,11 +116,12 @@ void TWReportingDriverUtility::subscribe(const TWReportingDriver& driver) {
 
 TWReportingDriverUtility::Snapshot TWReportingDriverUtility::getSnapShot() const {
   Snapshot snapshot;
+  const Chanmeter::Reading reading = chanmeter_.beginReading();
   for (const TWReportingIOChannelSubscription& source : ioChannelSubscriptions_) {
     infoLog(TWReportingDriverUtilityCategory(), "sampling driver %@", source.driver);
     std::optional<ChanmeterError> error;
     Chanmeter::Samples samples =
-        chanmeter_.createSamples(source.subscription, source.subscribedChannels, error);
+        chanmeter_.createSamplesIn(reading, source.subscription, source.subscribedChannels, error);
     if (samples == nullptr) {
       logSamplesError(error);
       continue;
@@ -133,8 +134,9 @@ TWReportingDriverUtility::Snapshot TWReportingDriverUtility::getSnapShot() const
 void TWReportingDriverUtility::sendDriverLogsForSession(TWReportingSession* session,
                                                         const Snapshot* driverSnapShot) const {
   Stats stats;
+  const Chanmeter::Reading reading = chanmeter_.beginReading();
   for (const TWReportingIOChannelSubscription& source : ioChannelSubscriptions_) {
-    collectChanges(source, driverSnapShot, stats);
+    collectChanges(source, reading, driverSnapShot, stats);
   }
   sendStats(session, kTypeSimple, std::move(stats.simple));
   sendStats(session, kTypeHistogram, std::move(stats.histograms));
@@ -143,11 +145,12 @@ void TWReportingDriverUtility::sendDriverLogsForSession(TWReportingSession* sess
 
 // Releases the samples that it takes when it returns, so that it never holds those of two drivers.
 void TWReportingDriverUtility::collectChanges(const TWReportingIOChannelSubscription& source,
+                                              const Chanmeter::Reading& reading,
                                               const Snapshot* driverSnapShot, Stats& stats) const {
   infoLog(TWReportingDriverUtilityCategory(), "getting latest samples");
   std::optional<ChanmeterError> error;
   const Chanmeter::Samples latest =
-      chanmeter_.createSamples(source.subscription, source.subscribedChannels, error);
+      chanmeter_.createSamplesIn(reading, source.subscription, source.subscribedChannels, error);
   infoLog(TWReportingDriverUtilityCategory(), "done getting latest samples");
   if (latest == nullptr) return logSamplesError(error);
   if (driverSnapShot == nullptr) return;

@@ -68,8 +68,8 @@ class TWReportingDriverUtility {
   struct Stats;
 
   void subscribe(const TWReportingDriver& driver);
-  void collectChanges(const TWReportingIOChannelSubscription& source, const Snapshot* driverSnapShot,
-                      Stats& stats) const;
+  void collectChanges(const TWReportingIOChannelSubscription& source, const Chanmeter::Reading& reading,
+                      const Snapshot* driverSnapShot, Stats& stats) const;
   static void process(const ChanmeterSample& sample, Stats& stats);
 
   Chanmeter& chanmeter_;

@@ -13,7 +13,7 @@ namespace tonewerk {
 // The driver-statistics library gives access to channels that drivers publish. A channel is identified by
 // driver, group, subgroup and name; its value is one number, a histogram or a set of states.
 //
-// Any thread. Everything that it returns is immutable, so that threads may share it.
+// Any thread. Threads may share everything that it returns.
 
 // A channel's own statement of its format. This side does not know formats above kSimpleArray.
 using ChanmeterFormat = std::uint8_t;
@@ -38,6 +38,12 @@ class ChanmeterChannels {
 class ChanmeterSubscription {
  public:
   virtual ~ChanmeterSubscription() = default;
+};
+
+// Lets several sets of samples share one look at the sources. Only the library makes it.
+class ChanmeterReading {
+ public:
+  virtual ~ChanmeterReading() = default;
 };
 
 // Gives one channel's value in a set of samples. The driver chooses units; the label names them. An accessor
@@ -83,6 +89,7 @@ class Chanmeter {
   using Channels = std::shared_ptr<const ChanmeterChannels>;
   using Subscription = std::shared_ptr<const ChanmeterSubscription>;
   using Samples = std::shared_ptr<const ChanmeterSamples>;
+  using Reading = std::shared_ptr<ChanmeterReading>;
   // Returns 0 to continue; any other result ends the iteration.
   using Callback = std::function<int(const ChanmeterSample&)>;
 
@@ -104,6 +111,18 @@ class Chanmeter {
   // Returns the current values, or null on failure.
   [[nodiscard]] virtual Samples createSamples(const Subscription& subscription, const Channels& subscribed,
                                               std::optional<ChanmeterError>& error) = 0;
+
+  // Begins a reading, for samples of several subscriptions, taken one after the other. Returns null if
+  // there is nothing to share.
+  [[nodiscard]] virtual Reading beginReading() { return nullptr; }
+
+  // Does the same as createSamples(), but samples of the same reading may share what was read of a source. No
+  // value is older than the reading's begin.
+  [[nodiscard]] virtual Samples createSamplesIn(const Reading& /*reading*/, const Subscription& subscription,
+                                                const Channels& subscribed,
+                                                std::optional<ChanmeterError>& error) {
+    return createSamples(subscription, subscribed, error);
+  }
 
   // Returns what changed from `earlier` to `later`, channel by channel:
   // - Values, hits, transitions and residencies are subtracted. Hits, transitions and residencies that went

@@ -32,9 +32,15 @@ class LinuxChanmeter final : public RecordChanmeter {
                                                 std::optional<ChanmeterError>& error) override;
   [[nodiscard]] Samples createSamples(const Subscription& subscription, const Channels& subscribed,
                                       std::optional<ChanmeterError>& error) override;
+  // Samples of one reading share what was read of published files. The kernel's files are read for each.
+  [[nodiscard]] Reading beginReading() override;
+  [[nodiscard]] Samples createSamplesIn(const Reading& reading, const Subscription& subscription,
+                                        const Channels& subscribed,
+                                        std::optional<ChanmeterError>& error) override;
 
  private:
-  ChanmeterRecords read(const ChannelChoice& choice, std::optional<ChanmeterError>& failure);
+  ChanmeterRecords read(const ChannelChoice& choice, PublishedChannels::Reading& reading,
+                        PublishedChannels::Selection* selection, std::optional<ChanmeterError>& failure);
 
   KernelSoundChannels kernel_;
   PublishedChannels published_;

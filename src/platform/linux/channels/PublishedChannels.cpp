@@ -33,32 +33,72 @@ ChannelFileProblem limitExceeded(std::size_t bound, const char* what) {
           "goes past the " + std::to_string(bound) + " " + what + " that all files together may have"};
 }
 
+// Erases all files but those with these names.
+template <typename T>
+void eraseExcept(std::map<std::string, T>& files, const std::vector<std::string>& names) {
+  std::erase_if(files, [&names](const auto& file) {
+    return !std::binary_search(names.begin(), names.end(), file.first);
+  });
+}
+
 }  // namespace
 
 void PublishedChannels::read(const ChannelChoice& choice, ChanmeterRecords& records,
                              std::optional<ChanmeterError>& error) {
+  Reading reading;
+  read(choice, reading, nullptr, records, error);
+}
+
+void PublishedChannels::read(const ChannelChoice& choice, Reading& reading, Selection* selection,
+                             ChanmeterRecords& records, std::optional<ChanmeterError>& error) {
   const MutexLock lock(mutex_);
-  const std::vector<std::string> names = fileNames(error);
-  forgetFilesExcept(names);
+  if (reading.number_ == 0) begin(reading);
+  if (reading.error_) error = reading.error_;
+  if (selection != nullptr) eraseExcept(selection->files_, reading.names_);
   Sums sums;
-  for (const std::string& name : names) {
+  for (const std::string& name : reading.names_) {
     File& file = files_[name];
     // A file that is known to belong to a driver that was not chosen need not be read.
     if (file.driver && !choice.mayInclude(file.driver)) {
       sums.bytes += file.text.size();
-      sums.channels += file.records.size();
+      sums.channels += file.channels();
       continue;
     }
     const std::string path = directory_ + "/" + name;
-    const ChannelFileProblem problem = refresh(path, file, sums);
+    const ChannelFileProblem problem = refresh(path, file, reading, sums);
     logProblem(path, problem, file.logged);
     if (problem.code != 0) {
       if (!error && choice.mayInclude(file.driver)) error = ChanmeterError{problem.code};
-      continue;
+    } else if (file.parsed && selection != nullptr) {
+      append(choice, file, selection->files_[name], records);
+    } else if (file.parsed) {
+      append(choice, file, records);
     }
-    std::copy_if(file.records.begin(), file.records.end(), std::back_inserter(records),
-                 [&choice](const auto& record) { return choice.includes(record->key); });
   }
+}
+
+void PublishedChannels::append(const ChannelChoice& choice, const File& file, ChanmeterRecords& records) {
+  std::copy_if(file.parsed->records.begin(), file.parsed->records.end(), std::back_inserter(records),
+               [&choice](const auto& record) { return choice.includes(record->key); });
+}
+
+void PublishedChannels::append(const ChannelChoice& choice, const File& file, Selection::Places& selected,
+                               ChanmeterRecords& records) {
+  const ChanmeterRecords& all = file.parsed->records;
+  if (selected.layout != file.layout) {
+    selected.layout = file.layout;
+    selected.places.clear();
+    for (std::size_t place = 0; place < all.size(); ++place) {
+      if (choice.includes(all[place]->key)) selected.places.push_back(static_cast<std::uint32_t>(place));
+    }
+  }
+  for (const std::uint32_t place : selected.places) records.push_back(all[place]);
+}
+
+void PublishedChannels::begin(Reading& reading) {
+  reading.number_ = ++lastReading_;
+  reading.names_ = fileNames(reading.error_);
+  eraseExcept(files_, reading.names_);
 }
 
 std::vector<std::string> PublishedChannels::fileNames(std::optional<ChanmeterError>& error) {
@@ -90,57 +130,69 @@ std::vector<std::string> PublishedChannels::fileNames(std::optional<ChanmeterErr
   return names;
 }
 
-void PublishedChannels::forgetFilesExcept(const std::vector<std::string>& names) {
-  std::erase_if(files_, [&names](const auto& file) {
-    return !std::binary_search(names.begin(), names.end(), file.first);
-  });
-}
-
 // Returns the file's problem. That may be that a limit is exceeded, which depends on the files before it.
-ChannelFileProblem PublishedChannels::refresh(const std::string& path, File& file, Sums& sums) {
-  struct stat status {};
-  if (stat(path.c_str(), &status) != 0) {
-    const std::error_code error = lastSystemError();
-    file.clearContents();
-    // The file was removed meanwhile, or is a dangling link.
-    return error == std::errc::no_such_file_or_directory ? ChannelFileProblem() : problemOf(error);
-  }
-  const auto size = static_cast<std::size_t>(status.st_size);
-  if (S_ISREG(status.st_mode) && size <= kMaxFileBytes) sums.bytes += size;
+ChannelFileProblem PublishedChannels::refresh(const std::string& path, File& file, Reading& reading,
+                                              Sums& sums) {
+  if (std::exchange(file.reading, reading.number_) != reading.number_) lookAt(path, file);
+  if (!file.exists) return file.problem;
+  sums.bytes += file.bytes;
   if (sums.bytes > kMaxBytes) {
     file.clearContents();  // it may have been read while there were fewer files before it
     return limitExceeded(kMaxBytes, "bytes");
   }
 
-  if (!file.stamp || FileStamp::of(status) != *file.stamp) readAgain(path, file);
-  sums.channels += file.records.size();
+  if (!file.isCurrent) readAgain(path, file, reading.buffer_);
+  sums.channels += file.channels();
   if (sums.channels > kMaxChannels) return limitExceeded(kMaxChannels, "channels");
   return file.problem;
 }
 
-void PublishedChannels::File::clearContents() {
-  stamp.reset();
-  text.clear();
-  text.shrink_to_fit();
-  records.clear();
-}
-
-void PublishedChannels::readAgain(const std::string& path, File& file) {
-  std::string text;
-  FileStamp stamp{};
-  file.stamp.reset();
-  if (const std::error_code error = readWholeFile(path, kMaxFileBytes, text, stamp)) {
+void PublishedChannels::lookAt(const std::string& path, File& file) {
+  struct stat status {};
+  file.exists = stat(path.c_str(), &status) == 0;
+  if (!file.exists) {
+    const std::error_code error = lastSystemError();
     file.clearContents();
+    // The file was removed meanwhile, or is a dangling link.
     file.problem = error == std::errc::no_such_file_or_directory ? ChannelFileProblem() : problemOf(error);
     return;
   }
-  if (stamp.isSettled()) file.stamp = stamp;
-  if (text == file.text && !text.empty()) return;
-  file.text = std::move(text);
+  const auto size = static_cast<std::size_t>(status.st_size);
+  file.bytes = S_ISREG(status.st_mode) && size <= kMaxFileBytes ? size : 0;
+  file.isCurrent = file.stamp && FileStamp::of(status) == *file.stamp;
+}
+
+void PublishedChannels::File::clearContents() {
+  isCurrent = false;
+  stamp.reset();
+  text.clear();
+  text.shrink_to_fit();
+  parsed.reset();
+}
+
+void PublishedChannels::readAgain(const std::string& path, File& file, std::string& buffer) {
+  FileStamp stamp{};
+  file.stamp.reset();
+  const std::error_code error = readWholeFile(path, kMaxFileBytes, buffer, stamp);
+  if (error) {
+    file.clearContents();
+    file.problem = error == std::errc::no_such_file_or_directory ? ChannelFileProblem() : problemOf(error);
+  } else {
+    if (stamp.isSettled()) file.stamp = stamp;
+    if (buffer != file.text || buffer.empty()) {
+      std::swap(buffer, file.text);
+      if (!file.parsed || !file.parsed->update(buffer, file.text)) parseText(file);
+    }
+  }
+  file.isCurrent = true;
+}
+
+void PublishedChannels::parseText(File& file) {
   file.problem = {};
-  std::optional<ChannelFile> parsed = ChannelFile::parse(file.text, file.problem);
-  file.records = parsed ? std::move(parsed->records) : ChanmeterRecords();
-  if (parsed) file.driver = std::move(parsed->driver);
+  file.parsed = ChannelFile::parse(file.text, file.problem);
+  if (!file.parsed) return;
+  file.driver = file.parsed->driver;
+  file.layout = ++lastLayout_;
 }
 
 void PublishedChannels::logProblem(const std::string& path, const ChannelFileProblem& problem,

@@ -8,6 +8,7 @@
 #include <string>
 #include <vector>
 
+#include "platform/Chanmeter.h"
 #include "platform/Log.h"
 #include "platform/linux/channels/ChannelChoice.h"
 #include "platform/linux/channels/ChannelFile.h"
@@ -19,7 +20,8 @@ namespace tonewerk {
 // Reads the channels that drivers and processes publish: each file `*.json` of one directory, unless its name
 // begins with a dot, holds the channels of one driver. docs/driver-channels.md describes the format.
 //
-// The contents are kept in memory, so a file that has not changed is neither read nor parsed again.
+// The contents are kept in memory, so a file that has not changed is neither read nor parsed again. If only
+// its numbers have changed, only these are parsed.
 //
 // Any thread; concurrent calls wait for each other.
 class PublishedChannels {
@@ -31,6 +33,27 @@ class PublishedChannels {
   static constexpr std::size_t kMaxBytes = std::size_t{8} << 20;
   static constexpr std::size_t kMaxChannels = 32768;
 
+  // Several calls of read() that share a reading list the directory once and look at each file once, when the
+  // first of them needs it. So no file is older than the first call. Only PublishedChannels uses its members.
+  class Reading final : public ChanmeterReading {
+    friend class PublishedChannels;
+    std::uint64_t number_ = 0;  // 0 before the first call
+    std::vector<std::string> names_;
+    std::optional<ChanmeterError> error_;  // of the directory
+    std::string buffer_;                   // kept from one file to the next, to save allocations
+  };
+
+  // Remembers which records of each file a choice includes. Use it with one choice only, which then costs
+  // little as long as files have the same channels. Only PublishedChannels uses its members.
+  class Selection {
+    friend class PublishedChannels;
+    struct Places {
+      std::uint64_t layout = 0;
+      std::vector<std::uint32_t> places;
+    };
+    std::map<std::string, Places> files_;  // by name
+  };
+
   // `log` must outlive this object. If the directory does not exist, there are no channels.
   PublishedChannels(std::string directory, const LogCategory& log)
       : directory_(std::move(directory)), log_(log) {}
@@ -39,18 +62,28 @@ class PublishedChannels {
   // each file. A file that cannot be read or does not have the right form is left out as a whole, and is
   // logged once until its problem changes. The first such file of a chosen driver sets `error`.
   void read(const ChannelChoice& choice, ChanmeterRecords& records, std::optional<ChanmeterError>& error);
+  // Does the same in a reading, and with a selection if it is not null.
+  void read(const ChannelChoice& choice, Reading& reading, Selection* selection, ChanmeterRecords& records,
+            std::optional<ChanmeterError>& error);
 
  private:
   // The state of one file.
   struct File {
+    std::uint64_t reading = 0;  // that looked at it last
+    bool exists = false;     // when that reading looked at it; `bytes` and `isCurrent` are of that time, too
+    std::size_t bytes = 0;   // that count for the limit
+    bool isCurrent = false;  // whether the members below are those of that reading
+
     std::optional<FileStamp> stamp;  // of `text`; none if a change might not alter the stamp
     std::string text;
-    ChanmeterRecords records;    // parsed from `text`
-    ChannelFileProblem problem;  // of the file or its text; code 0 for none
+    std::optional<ChannelFile> parsed;  // from `text`
+    std::uint64_t layout = 0;           // differs between texts with other channels; 0 if none was parsed
+    ChannelFileProblem problem;         // of the file or its text; code 0 for none
     // Kept after a later problem, to tell whose channels are missing.
     std::optional<std::string> driver;
     std::string logged;  // the text of the problem that was logged last
 
+    std::size_t channels() const { return parsed ? parsed->records.size() : 0; }
     // Frees the contents; the next read() reads the file again.
     void clearContents();
   };
@@ -60,11 +93,17 @@ class PublishedChannels {
     std::size_t channels = 0;
   };
 
+  void begin(Reading& reading) REQUIRES(mutex_);
   // The names of the channel files, sorted.
   std::vector<std::string> fileNames(std::optional<ChanmeterError>& error) REQUIRES(mutex_);
-  void forgetFilesExcept(const std::vector<std::string>& names) REQUIRES(mutex_);
-  [[nodiscard]] static ChannelFileProblem refresh(const std::string& path, File& file, Sums& sums);
-  static void readAgain(const std::string& path, File& file);
+  [[nodiscard]] ChannelFileProblem refresh(const std::string& path, File& file, Reading& reading, Sums& sums)
+      REQUIRES(mutex_);
+  static void lookAt(const std::string& path, File& file);
+  void readAgain(const std::string& path, File& file, std::string& buffer) REQUIRES(mutex_);
+  void parseText(File& file) REQUIRES(mutex_);
+  static void append(const ChannelChoice& choice, const File& file, ChanmeterRecords& records);
+  static void append(const ChannelChoice& choice, const File& file, Selection::Places& selected,
+                     ChanmeterRecords& records);
   // Logs a problem unless it is the one in `logged`.
   void logProblem(const std::string& path, const ChannelFileProblem& problem, std::string& logged) const;
 
@@ -73,6 +112,8 @@ class PublishedChannels {
   Mutex mutex_;
   std::map<std::string, File> files_ GUARDED_BY(mutex_);  // by name
   std::string loggedDirectoryProblem_ GUARDED_BY(mutex_);
+  std::uint64_t lastReading_ GUARDED_BY(mutex_) = 0;
+  std::uint64_t lastLayout_ GUARDED_BY(mutex_) = 0;
 };
 
 }  // namespace tonewerk

@@ -100,6 +100,79 @@ TEST_F(LinuxChanmeterTest, DoesNotReadADriverThatIsNewerThanTheSubscription) {
   EXPECT_THAT(textsOf(samplesOf(channels)), ElementsAre("Amp n=5"));
 }
 
+TEST_F(LinuxChanmeterTest, SamplesOfAReadingShowAFileAsItWasWhenItWasFirstNeeded) {
+  publishValue("Amp", "pdm", 5);
+  publishValue("Mic", "Tx", 6);
+  const auto amp = channelsIn("pdm");
+  const auto mic = channelsIn("Tx");
+  const auto reading = chanmeter_.beginReading();
+  const auto sample = [&](const Chanmeter::Channels& channels, const Chanmeter::Reading& within) {
+    error_.reset();
+    Chanmeter::Channels subscribed;
+    const auto subscription = chanmeter_.createSubscription(channels, subscribed, error_);
+    return textsOf(chanmeter_.createSamplesIn(within, subscription, subscribed, error_));
+  };
+  EXPECT_THAT(sample(amp, reading), testing::Contains("Amp n=5"));
+  publishValue("Amp", "pdm", 7);
+  publishValue("Mic", "Tx", 8);
+  EXPECT_THAT(sample(amp, reading), testing::Contains("Amp n=5"));
+  EXPECT_THAT(sample(mic, reading), testing::Contains("Mic n=8"));
+  EXPECT_THAT(sample(amp, chanmeter_.beginReading()), testing::Contains("Amp n=7"));
+  // The first reading does not know what the second one read.
+  EXPECT_THAT(sample(amp, reading), testing::Contains("Amp n=7"));
+}
+
+TEST_F(LinuxChanmeterTest, EachSampleOfAReadingGetsTheErrorOfItsDriver) {
+  publishValue("Amp", "pdm", 5);
+  publishValue("Mic", "Tx", 6);
+  const auto amp = channelsIn("pdm");
+  const auto mic = channelsIn("Tx");
+  publish("Amp.json", "{");
+  const auto reading = chanmeter_.beginReading();
+  const auto codeOf = [&](const Chanmeter::Channels& channels) {
+    error_.reset();
+    Chanmeter::Channels subscribed;
+    const auto subscription = chanmeter_.createSubscription(channels, subscribed, error_);
+    static_cast<void>(chanmeter_.createSamplesIn(reading, subscription, subscribed, error_));
+    return code();
+  };
+  EXPECT_EQ(codeOf(amp), kChannelsNotJson);
+  EXPECT_EQ(codeOf(amp), kChannelsNotJson);
+  EXPECT_EQ(codeOf(mic), 0);
+  EXPECT_THAT(log_.textsOf("twrs", LogLevel::kError), testing::SizeIs(1));
+}
+
+// A subscription remembers the places of its channels in a file.
+TEST_F(LinuxChanmeterTest, ASubscriptionFindsItsChannelsInAFileWhoseChannelsChanged) {
+  const auto textOf = [](const std::string& names, int value) {
+    std::string text = R"({"driver": "Amp", "channels": [)";
+    for (const char name : names) {
+      text += (name == names.front() ? "" : ",") + std::string(R"({"group": "pdm", "name": ")") + name +
+              R"(", "format": "simple", "value": )" + std::to_string(value++) + "}";
+    }
+    return text + "]}";
+  };
+  publish("amp.json", textOf("ab", 1));
+  Chanmeter::Channels subscribed;
+  const auto subscription = chanmeter_.createSubscription(channelsIn("pdm"), subscribed, error_);
+  const auto sample = [&] { return textsOf(chanmeter_.createSamples(subscription, subscribed, error_)); };
+  EXPECT_THAT(sample(), ElementsAre("Amp a=1", "Amp b=2"));
+  publish("amp.json", textOf("ab", 5));
+  EXPECT_THAT(sample(), ElementsAre("Amp a=5", "Amp b=6"));
+  publish("amp.json", textOf("xbya", 1));
+  EXPECT_THAT(sample(), ElementsAre("Amp b=2", "Amp a=4"));
+  publish("amp.json", textOf("xbya", 11));
+  EXPECT_THAT(sample(), ElementsAre("Amp b=12", "Amp a=14"));
+  publish("amp.json", "{");
+  EXPECT_FALSE(chanmeter_.createSamples(subscription, subscribed, error_));
+  publish("amp.json", textOf("ab", 3));
+  EXPECT_THAT(sample(), ElementsAre("Amp a=3", "Amp b=4"));
+  std::filesystem::remove(directory_.path("channels/amp.json"));
+  EXPECT_THAT(sample(), IsEmpty());
+  publish("amp.json", textOf("b", 9));
+  EXPECT_THAT(sample(), ElementsAre("Amp b=9"));
+}
+
 TEST_F(LinuxChanmeterTest, SamplesTheOthersWhenOneDriverFails) {
   publishValue("Amp", "pdm", 5);
   publishValue("Mic", "pdm", 6);
