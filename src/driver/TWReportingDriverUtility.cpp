@@ -3,8 +3,10 @@
 
 #include <algorithm>
 #include <array>
+#include <charconv>
+#include <concepts>
 #include <cstdint>
-#include <iterator>
+#include <system_error>
 #include <utility>
 
 #include "platform/Log.h"
@@ -34,6 +36,9 @@ constexpr std::array<DriverNames, 9> kDrivers{{{"OrvaneAE2MCA", nullptr},
                                                {nullptr, "Pellan2"},
                                                {"pdm", nullptr}}};
 
+// Enough for most keys and values, so that they grow without allocations.
+constexpr std::size_t kTextBytes = 256;
+
 std::optional<std::string> optionalName(const char* name) {
   return name == nullptr ? std::nullopt : std::optional<std::string>(name);
 }
@@ -45,20 +50,46 @@ void logSamplesError(const std::optional<ChanmeterError>& error) {
 }
 
 void appendCleaned(std::string& key, std::string_view name) {
-  std::copy_if(name.begin(), name.end(), std::back_inserter(key),
-               [](char character) { return character != '_' && character != ' '; });
+  while (!name.empty()) {
+    const std::size_t size = std::min(name.find_first_of("_ "), name.size());
+    key += name.substr(0, size);
+    name.remove_prefix(std::min(size + 1, name.size()));
+  }
+}
+
+// Appends the number as std::to_string() writes it, without an allocation.
+void appendInteger(std::string& text, std::integral auto number) {
+  std::array<char, 24> digits;  // 64 bits and a sign are 20 characters
+  text.append(digits.data(), std::to_chars(digits.data(), digits.data() + digits.size(), number).ptr);
+}
+
+// Appends a number as "%f" writes it, in a third of the time. A duty cycle is from 0 to 1.
+void appendDutyCycle(std::string& text, double dutyCycle) {
+  std::array<char, 32> digits;
+  const auto [end, error] =
+      std::to_chars(digits.data(), digits.data() + digits.size(), dutyCycle, std::chars_format::fixed, 6);
+  if (error != std::errc()) return appendLogNumber(text, dutyCycle, 'f');
+  text.append(digits.data(), end);
 }
 
 void appendBucket(std::string& text, std::int64_t lower, std::int64_t upper, std::int64_t hits) {
-  text += std::to_string(lower) + '-' + std::to_string(upper) + ':' + std::to_string(hits) + ';';
+  appendInteger(text, lower);
+  text += '-';
+  appendInteger(text, upper);
+  text += ':';
+  appendInteger(text, hits);
+  text += ';';
 }
 
 void appendState(std::string& text, const ChanmeterSample& sample, std::int32_t index) {
   text += "name:";
   text += sample.stateName(index);
-  text += ",transition:" + std::to_string(sample.stateInTransitions(index));
-  text += ",residency:" + std::to_string(sample.stateResidency(index)) + ",duty_cycle:";
-  appendLogNumber(text, sample.stateDutyCycle(index), 'f');
+  text += ",transition:";
+  appendInteger(text, sample.stateInTransitions(index));
+  text += ",residency:";
+  appendInteger(text, sample.stateResidency(index));
+  text += ",duty_cycle:";
+  appendDutyCycle(text, sample.stateDutyCycle(index));
   text += ';';
 }
 
@@ -201,6 +232,7 @@ void TWReportingDriverUtility::processHistogramData(const ChanmeterSample& sampl
   std::int64_t bucketLower = 0;
   std::int64_t bucketUpper = 0;
   std::string buckets;
+  buckets.reserve(kTextBytes);
   for (std::int32_t i = 0; i < count; ++i) {
     const int error = sample.histogramBucketBounds(i, bucketLower, bucketUpper);
     if (error != 0) {
@@ -214,17 +246,28 @@ void TWReportingDriverUtility::processHistogramData(const ChanmeterSample& sampl
   if (buckets.empty()) return;
   buckets.pop_back();  // the last ";"
 
-  std::string text = "count=" + std::to_string(count) + ",lower=" + std::to_string(lower) +
-                     ",upper=" + std::to_string(upper) +
-                     ",min=" + std::to_string(sample.histogramMinValue()) +
-                     ",max=" + std::to_string(sample.histogramMaxValue()) + ",unit=";
+  std::string text;
+  text.reserve(kTextBytes);
+  text += "count=";
+  appendInteger(text, count);
+  text += ",lower=";
+  appendInteger(text, lower);
+  text += ",upper=";
+  appendInteger(text, upper);
+  text += ",min=";
+  appendInteger(text, sample.histogramMinValue());
+  text += ",max=";
+  appendInteger(text, sample.histogramMaxValue());
+  text += ",unit=";
   text += sample.unitLabel().value_or("(null)");
-  text += "::" + buckets;
+  text += "::";
+  text += buckets;
   driverStats.set(getDriverStatsKey(sample, "Histogram"), text);
 }
 
 void TWReportingDriverUtility::processStateData(const ChanmeterSample& sample, DriverStatsMap& driverStats) {
   std::string text;
+  text.reserve(kTextBytes);
   const std::int32_t count = sample.stateCount();
   for (std::int32_t i = 0; i < count; ++i) {
     if (sample.stateResidency(i) != 0) appendState(text, sample, i);
@@ -236,6 +279,7 @@ void TWReportingDriverUtility::processStateData(const ChanmeterSample& sample, D
 std::string TWReportingDriverUtility::getDriverStatsKey(const ChanmeterSample& sample,
                                                         std::string_view type) {
   std::string key;
+  key.reserve(kTextBytes);
   if (const auto driver = sample.driverName()) {
     appendCleaned(key, driver->substr(0, driver->find('<')));
     key += '_';
