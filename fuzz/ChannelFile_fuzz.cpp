@@ -1,11 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Reads the input as a file of driver channels. Then calls every function of its samples, and takes the
-// difference of the file with itself.
+// Reads the input as a file of driver channels. Then calls every function of its samples, takes the
+// difference of the file with itself, and reads the file again with other numbers.
+#include <algorithm>
 #include <cstddef>
 #include <cstdint>
 #include <cstdlib>
 #include <memory>
+#include <string>
 #include <string_view>
 
 #include "platform/chanmeter/ChanmeterDifference.h"
@@ -45,6 +47,21 @@ void expectNoChange(const ChanmeterRecords& records) {
   }
 }
 
+bool isSame(const ChanmeterRecords& a, const ChanmeterRecords& b) {
+  return std::equal(a.begin(), a.end(), b.begin(), b.end(),
+                    [](const auto& one, const auto& other) { return *one == *other; });
+}
+
+// Reads the file again with other digits. If that needs no parsing, the result is that of parsing.
+void expectUpdateLikeParsing(std::string_view previous, ChannelFile file) {
+  std::string text(previous);
+  std::replace(text.begin(), text.end(), '1', '7');
+  if (!file.update(previous, text)) return;
+  ChannelFileProblem problem;
+  const std::optional<ChannelFile> whole = ChannelFile::parse(text, problem);
+  expect(whole && whole->driver == file.driver && isSame(whole->records, file.records));
+}
+
 void read(std::string_view text) {
   ChannelFileProblem problem;
   const std::optional<ChannelFile> file = ChannelFile::parse(text, problem);
@@ -53,6 +70,7 @@ void read(std::string_view text) {
   if (!file) return;
   for (const auto& record : file->records) ask(ChanmeterRecordSample(record));
   expectNoChange(file->records);
+  expectUpdateLikeParsing(text, *file);
 }
 
 }  // namespace
