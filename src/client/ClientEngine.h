@@ -152,9 +152,10 @@ class ClientEngine {
   void sleep() REQUIRES(mutex_);
 
   const ClientSettings settings_;
-  std::atomic<bool> hasForked_{false};
+  // Real-time threads read this for each message, so it has a cache line without anything that changes.
+  alignas(kCacheLineBytes) std::atomic<bool> hasForked_{false};
 
-  mutable Mutex mutex_;
+  alignas(kCacheLineBytes) mutable Mutex mutex_;
   Deliveries deliveries_ GUARDED_BY(mutex_);
   ClientOutbox outbox_ GUARDED_BY(mutex_);
   ClientThread thread_ GUARDED_BY(mutex_);

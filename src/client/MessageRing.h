@@ -9,14 +9,20 @@
 #include <utility>
 #include <vector>
 
+#include "client/RingMemory.h"
 #include "tonewerk/reporting.h"
 
 namespace tonewerk {
 
+// Data that one thread often writes and data that another thread often reads belong into different cache
+// lines.
+inline constexpr std::size_t kCacheLineBytes = 64;
+
 // Counts the messages that a session has lost, in its queue and in its senders' rings. Each message that is
 // taken keeps the count of that moment, and so the number of losses before it, in whatever order messages are
-// sent. Any thread may call it; it takes no lock, allocates nothing and makes no system call.
-class LossCount {
+// sent. Any thread may call it; it takes no lock, allocates nothing and makes no system call. Producers read
+// it for each message, so it has a cache line of its own.
+class alignas(kCacheLineBytes) LossCount {
  public:
   void add(std::uint32_t category) {
     setLastCategory(category);
@@ -81,7 +87,7 @@ class MessageRing {
   MessageRing(const MessageRing&) = delete;
   MessageRing& operator=(const MessageRing&) = delete;
 
-  std::size_t capacity() const { return memory_.size(); }
+  std::size_t capacity() const { return memory_.bytes().size(); }
 
   // Producer. Returns TWR_OK; TWR_FULL when there is no room at present; TWR_TOO_LARGE when there never can
   // be; TWR_INVALID for a list; or the payload's problem. A message that is not taken counts as dropped.
@@ -94,35 +100,39 @@ class MessageRing {
 
   // Any thread. Positions only grow. All messages from before a call of writtenPosition() were read once
   // readPosition() has reached its result.
-  std::uint64_t writtenPosition() const { return written_.load(std::memory_order_acquire); }
-  std::uint64_t readPosition() const { return read_.load(std::memory_order_acquire); }
-  std::uint64_t dropped() const { return dropped_.load(std::memory_order_acquire); }
+  std::uint64_t writtenPosition() const { return producer_.written.load(std::memory_order_acquire); }
+  std::uint64_t readPosition() const { return consumer_.read.load(std::memory_order_acquire); }
+  std::uint64_t dropped() const { return producer_.dropped.load(std::memory_order_acquire); }
 
  private:
   struct Header;
 
   [[nodiscard]] twr_status drop(std::uint32_t category, twr_status why);
-  bool hasRoom(std::uint64_t written, std::size_t bytes);
-  void copyIn(std::uint64_t position, const void* from, std::size_t size);
-  void copyOut(std::uint64_t position, void* to, std::size_t size) const;
+  [[nodiscard]] bool hasRoom(std::uint64_t written, std::size_t bytes);
+  void writeAround(std::uint64_t position, const Header& header, const unsigned char* bytes);
   std::span<const unsigned char> bytesAt(std::uint64_t position, std::size_t size);
 
-  // The two sides write to different cache lines, so that they do not slow each other down. Each side reads
-  // the other's position only when its own copy of it says that there is no room, or no message.
-  static constexpr std::size_t kCacheLineBytes = 64;
+  const RingMemory memory_;
 
-  std::vector<unsigned char> memory_;
-  LossCount& losses_;
-
-  alignas(kCacheLineBytes) std::atomic<std::uint64_t> written_{0};
-  std::atomic<std::uint64_t> dropped_{0};
-  std::uint64_t seenRead_ = 0;
-
-  alignas(kCacheLineBytes) std::atomic<std::uint64_t> read_{0};
-  std::uint64_t seenWritten_ = 0;
-  std::size_t frontBytes_ = 0;
-  std::vector<unsigned char>
-      joined_;  // a copy of the front message's bytes when they wrap around the ring's end
+  // The two sides write to different cache lines, so that they do not slow each other down, and each has all
+  // that it needs in its own line. Each side reads the other's position only when its own copy of it says
+  // that there is no room, or no message.
+  struct alignas(kCacheLineBytes) Producer {
+    const std::span<unsigned char> bytes;
+    LossCount& losses;
+    std::atomic<std::uint64_t> written;
+    std::atomic<std::uint64_t> dropped;
+    std::uint64_t seenRead;
+  };
+  struct alignas(kCacheLineBytes) Consumer {
+    const std::span<const unsigned char> bytes;
+    std::atomic<std::uint64_t> read;
+    std::uint64_t seenWritten;
+    std::size_t frontBytes;
+    std::vector<unsigned char> joined;  // the front message's bytes when they wrap around the ring's end
+  };
+  Producer producer_;
+  Consumer consumer_;
 };
 
 }  // namespace tonewerk

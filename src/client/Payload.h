@@ -16,9 +16,8 @@ inline constexpr std::uint32_t kPayloadIsList = 1;
 
 // Why `payload` cannot be a message or a configuration; TWR_OK when it can.
 [[nodiscard]] inline twr_status problemOfMap(const twr_payload& payload) {
-  const twr_status problem = twr_payload_problem(&payload);
-  if (problem != TWR_OK) return problem;
-  return (payload.flags & kPayloadIsList) == 0 ? TWR_OK : TWR_INVALID;
+  if (payload.problem != TWR_OK) return static_cast<twr_status>(payload.problem);
+  return payload.depth == 0 && (payload.flags & kPayloadIsList) == 0 ? TWR_OK : TWR_INVALID;
 }
 
 // Appends the part of a request or a notification that follows its head: the method and its parameters, which

@@ -308,7 +308,9 @@ twr_sender* twr_sender_open(twr_session* session, size_t ringBytes) {
   });
 }
 
-twr_status twr_sender_send(twr_sender* sender, uint32_t category, uint16_t type, const twr_payload* payload) {
+// Hot functions lie next to each other in the program.
+[[gnu::hot]] twr_status twr_sender_send(twr_sender* sender, uint32_t category, uint16_t type,
+                                        const twr_payload* payload) {
   if (sender == nullptr || payload == nullptr) return TWR_INVALID;
   if (sender->hasForked.load(std::memory_order_relaxed)) return TWR_FORKED;
   return sender->ring.push(category, type, *payload);

@@ -4,10 +4,12 @@
 #include <cstring>
 #include <deque>
 #include <gmock/gmock.h>
+#include <numeric>
 #include <rapidcheck/gtest.h>
 #include <string>
 #include <thread>
 #include <tuple>
+#include <utility>
 #include <vector>
 
 #include "platform/linux/messagepack/RpcLimits.h"
@@ -24,10 +26,12 @@ class Ring : public Losses, public MessageRing {
   explicit Ring(std::size_t bytes) : MessageRing(bytes, losses) {}
 };
 
-// A payload with one text entry, `size` bytes long in all, filled with a character of choice.
+// A payload with one text entry, `size` bytes long in all and filled with a character of choice, or with
+// these bytes.
 class Text {
  public:
-  Text(std::size_t size, char fill) : bytes_(size, fill) {
+  Text(std::size_t size, char fill) : Text(std::string(size, fill)) {}
+  explicit Text(std::string bytes) : bytes_(std::move(bytes)) {
     twr_payload_init(&payload_, bytes_.data(), bytes_.size());
     payload_.size = payload_.capacity;
     payload_.entries = 1;
@@ -129,6 +133,17 @@ TEST(MessageRingTest, TakesTheLargestMessageAtAnyPlaceOfTheRing) {
     ASSERT_EQ(ring.push(1, 0, Text(1, 'x')),
               TWR_OK);  // 40 bytes, so that messages begin at every place of the ring
     ASSERT_EQ(textOf(*ring.front()), "x");
+    ring.pop();
+  }
+}
+
+TEST(MessageRingTest, GivesEveryByteOfMessagesOfAllSizes) {
+  Ring ring(1024);
+  for (std::size_t size = 0; size <= 300; ++size) {
+    std::string bytes(size, '\0');
+    std::iota(bytes.begin(), bytes.end(), static_cast<char>(size));
+    ASSERT_EQ(ring.push(1, 0, Text(bytes)), TWR_OK);
+    ASSERT_EQ(textOf(*ring.front()), bytes);
     ring.pop();
   }
 }
