@@ -10,7 +10,8 @@
 namespace tonewerk {
 namespace {
 
-constexpr std::chrono::microseconds kLongestWait = std::chrono::minutes(1);
+// An idle process wakes up at this interval for nothing. In milliseconds it fits into poll()'s int.
+constexpr std::chrono::microseconds kLongestWait = std::chrono::hours(24);
 
 // The same address as the library's default.
 std::string systemBusAddress() {

@@ -31,7 +31,7 @@ using BusSlot = std::unique_ptr<sd_bus_slot, BusSlotReleaser>;
 // `problem`, when it cannot start.
 [[nodiscard]] Bus openBus(const std::string& address, std::string& problem);
 
-// How long the bus needs no processing, unless its descriptor becomes ready earlier. At most a minute.
+// How long the bus needs no processing, unless its descriptor becomes ready earlier. At most a day.
 std::chrono::milliseconds timeToNextBusWork(sd_bus* bus);
 
 }  // namespace tonewerk
