@@ -33,8 +33,8 @@ std::int64_t coarseNanoseconds() {
 }
 
 double secondsOf(std::int64_t nanoseconds) {
-  return static_cast<double>(nanoseconds / kNanoseconds) +
-         static_cast<double>(nanoseconds % kNanoseconds) / 1e9;
+  const std::int64_t seconds = nanoseconds / kNanoseconds;
+  return static_cast<double>(seconds) + static_cast<double>(nanoseconds % kNanoseconds) / 1e9;
 }
 
 // Does the same as memcpy(), without a call: the function's code is seldom in the caches of a thread that has
