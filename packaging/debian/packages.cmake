@@ -33,8 +33,9 @@ into reports to query, plot, keep on the device or forward: analytics events,
 summaries, metric records, power-log events and JSON files.
 
 It touches no audio, and sends nothing anywhere unless it is told to.")
+# libcurl is loaded at run time, so that the package builder does not find it.
 set(CPACK_DEBIAN_DAEMON_PACKAGE_DEPENDS
-  "systemd | systemd-standalone-sysusers | systemd-sysusers, systemd | systemd-standalone-tmpfiles | systemd-tmpfiles")
+  "libcurl4 (>= 7.85), systemd | systemd-standalone-sysusers | systemd-sysusers, systemd | systemd-standalone-tmpfiles | systemd-tmpfiles")
 set(CPACK_DEBIAN_DAEMON_PACKAGE_RECOMMENDS "tonewerk-reporting-tools")
 set(CPACK_DEBIAN_DAEMON_PACKAGE_SUGGESTS "apparmor, dbus, lttng-tools, pipewire-bin, procps")
 set(CPACK_DEBIAN_DAEMON_PACKAGE_CONTROL_EXTRA
