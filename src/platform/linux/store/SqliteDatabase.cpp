@@ -60,6 +60,13 @@ bool SqliteStatement::run() {
   return done;
 }
 
+std::optional<std::int64_t> SqliteStatement::firstNumber() {
+  std::optional<std::int64_t> found;
+  if (step() == Step::kRow) found = integer(0);
+  reset();
+  return found;
+}
+
 std::int64_t SqliteStatement::integer(int column) const { return sqlite3_column_int64(statement_, column); }
 
 double SqliteStatement::number(int column) const { return sqlite3_column_double(statement_, column); }
@@ -99,12 +106,20 @@ std::string uriPath(const std::string& path) {
   return escaped;
 }
 
+// SQLite counts the memory that it uses, under a lock that all threads share, unless it is told before its
+// first use not to. Nobody asks for the count.
+void disableMemoryStatistics() {
+  static const int result = sqlite3_config(SQLITE_CONFIG_MEMSTATUS, 0);
+  (void)result;  // it fails when another library has used SQLite before, and then only costs time
+}
+
 }  // namespace
 
 SqliteDatabase::~SqliteDatabase() { close(); }
 
 bool SqliteDatabase::open(const std::string& path, Mode mode, std::chrono::milliseconds patience) {
   close();
+  disableMemoryStatistics();
   int flags = SQLITE_OPEN_NOMUTEX | SQLITE_OPEN_EXRESCODE;
   flags |= mode == Mode::kReadWrite ? SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE : SQLITE_OPEN_READONLY;
   std::string name = path;
@@ -135,8 +150,7 @@ SqliteStatement SqliteDatabase::prepare(const std::string& sql) {
 
 std::optional<std::int64_t> SqliteDatabase::number(const std::string& sql) {
   SqliteStatement statement = prepare(sql);
-  if (!statement || statement.step() != SqliteStatement::Step::kRow) return std::nullopt;
-  return statement.integer(0);
+  return statement ? statement.firstNumber() : std::nullopt;
 }
 
 std::int64_t SqliteDatabase::changes() const { return sqlite3_changes64(database_); }

@@ -42,6 +42,9 @@ class SqliteStatement {
   // Steps and resets a statement that has no rows. False on failure.
   [[nodiscard]] bool run();
 
+  // Steps once and resets. The first column of the first row; none on failure, and when there is no row.
+  [[nodiscard]] std::optional<std::int64_t> firstNumber();
+
   // Columns of the current row, counted from 0.
   std::int64_t integer(int column) const;
   double number(int column) const;

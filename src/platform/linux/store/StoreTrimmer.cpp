@@ -85,6 +85,11 @@ OldestRows* oldestOf(std::vector<OldestRows>& tables) {
 
 std::int64_t StoreBounds::walBytes() const { return std::clamp(bytes / 8, kMinWalBytes, kMaxWalBytes); }
 
+StoreTrimmer::StoreTrimmer(SqliteDatabase& database)
+    : database_(database),
+      countPages_(database.prepare("PRAGMA page_count")),
+      countFreePages_(database.prepare("PRAGMA freelist_count")) {}
+
 StoreTrimmer::Outcome StoreTrimmer::trimAge(const StoreBounds& bounds, double now) {
   for (int round = 0; round < kRoundsPerSlice; ++round) {
     const std::int64_t deleted = deleteUpTo(now - bounds.seconds);
@@ -136,11 +141,10 @@ StoreTrimmer::Outcome StoreTrimmer::vacuum(std::int64_t fileBytes) {
 }
 
 bool StoreTrimmer::measure() {
-  const auto size = database_.number("PRAGMA page_size");
-  const auto pages = database_.number("PRAGMA page_count");
-  const auto freePages = database_.number("PRAGMA freelist_count");
-  if (!size || !pages || !freePages) return false;
-  pageBytes_ = *size;
+  if (pageBytes_ == 0) pageBytes_ = database_.number("PRAGMA page_size").value_or(0);
+  const auto pages = countPages_.firstNumber();
+  const auto freePages = countFreePages_.firstNumber();
+  if (pageBytes_ == 0 || !pages || !freePages) return false;
   pages_ = *pages;
   freePages_ = *freePages;
   return true;

@@ -32,7 +32,8 @@ class StoreTrimmer {
  public:
   enum class Outcome { kDone, kMoreToDo, kFailed };
 
-  explicit StoreTrimmer(SqliteDatabase& database) : database_(database) {}
+  // `database` is open and outlives it.
+  explicit StoreTrimmer(SqliteDatabase& database);
 
   // One slice of deleting for age; `now` is in seconds since 1970. On failure the database has the problem.
   [[nodiscard]] Outcome trimAge(const StoreBounds& bounds, double now);
@@ -49,6 +50,9 @@ class StoreTrimmer {
   [[nodiscard]] std::optional<bool> emptyNewest(std::int64_t maxBytes);
 
   SqliteDatabase& database_;
+  // Used after every batch, so they are prepared once.
+  SqliteStatement countPages_;
+  SqliteStatement countFreePages_;
   std::int64_t pageBytes_ = 0;
   std::int64_t pages_ = 0;
   std::int64_t freePages_ = 0;
