@@ -3,27 +3,44 @@
 
 #include <string>
 
-#include "platform/JsonService.h"
 #include "platform/linux/store/StoreSchema.h"
 
 namespace tonewerk {
 
 static_assert(kStoreNamesPerRow == 2, "an event has two names at most");
 
-AnalyticsTable::AnalyticsTable(SqliteDatabase& database, const JsonService& json)
-    : database_(database),
-      json_(json),
-      insertRow_(database.prepare(
-          "INSERT INTO analytics_row (recorded_at, name_set, payload) VALUES (?1, ?2, ?3)")) {}
+AnalyticsTable::AnalyticsTable(SqliteDatabase& database) : database_(database) {
+  database.addRows("new_analytics_row", 3, *this);
+  insertRows_ = database.prepare(
+      "INSERT INTO analytics_row (recorded_at, name_set, payload) SELECT c0, c1, c2 FROM new_analytics_row");
+}
 
-bool AnalyticsTable::insert(const AnalyticsRow& row) {
-  const std::optional<std::int64_t> names = nameSet(row.names);
-  if (!names) return false;
-  const std::string payload = json_.compact(row.payload);
-  insertRow_.bind(1, row.recordedAt);
-  insertRow_.bind(2, *names);
-  insertRow_.bind(3, payload);
-  return insertRow_.run();
+bool AnalyticsTable::insert(const StoreBatch& batch) {
+  if (batch.analytics().empty()) return true;
+  batchSets_.clear();
+  for (const EventNames& names : batch.names()) {
+    const std::optional<std::int64_t> set = nameSet(names);
+    if (!set) return false;
+    batchSets_.push_back(*set);
+  }
+  batch_ = &batch;
+  const bool inserted = insertRows_.run();
+  batch_ = nullptr;
+  return inserted;
+}
+
+std::size_t AnalyticsTable::rowCount() const { return batch_ == nullptr ? 0 : batch_->analytics().size(); }
+
+void AnalyticsTable::read(std::size_t row, int column, SqliteCell& cell) const {
+  const StoreBatch::Analytics& event = batch_->analytics()[row];
+  switch (column) {
+    case 0:
+      return cell.set(event.recordedAt);
+    case 1:
+      return cell.set(batchSets_[event.names]);
+    default:
+      return cell.set(batch_->text(event.payload));
+  }
 }
 
 std::optional<std::int64_t> AnalyticsTable::nameSet(const EventNames& names) {

@@ -3,15 +3,32 @@
 
 namespace tonewerk {
 
-MetricTable::MetricTable(SqliteDatabase& database)
-    : insertRow_(database.prepare("INSERT INTO metric (posted_at, identifier, record) VALUES (?1, ?2, ?3)")) {
+MetricTable::MetricTable(SqliteDatabase& database) {
+  database.addRows("new_metric", 3, *this);
+  insertRows_ = database.prepare(
+      "INSERT INTO metric (posted_at, identifier, record) SELECT c0, c1, c2 FROM new_metric");
 }
 
-bool MetricTable::insert(const MetricRow& row) {
-  insertRow_.bind(1, row.postedAt);
-  insertRow_.bind(2, static_cast<std::int64_t>(row.identifier));
-  insertRow_.bindBytes(3, row.record);
-  return insertRow_.run();
+bool MetricTable::insert(const StoreBatch& batch) {
+  if (batch.metrics().empty()) return true;
+  batch_ = &batch;
+  const bool inserted = insertRows_.run();
+  batch_ = nullptr;
+  return inserted;
+}
+
+std::size_t MetricTable::rowCount() const { return batch_ == nullptr ? 0 : batch_->metrics().size(); }
+
+void MetricTable::read(std::size_t row, int column, SqliteCell& cell) const {
+  const StoreBatch::Metric& metric = batch_->metrics()[row];
+  switch (column) {
+    case 0:
+      return cell.set(metric.postedAt);
+    case 1:
+      return cell.set(static_cast<std::int64_t>(metric.identifier));
+    default:
+      return cell.setBytes(batch_->text(metric.record));
+  }
 }
 
 }  // namespace tonewerk

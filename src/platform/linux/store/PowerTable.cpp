@@ -1,24 +1,37 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/store/PowerTable.h"
 
-#include <string>
-
-#include "platform/JsonService.h"
-
 namespace tonewerk {
 
-PowerTable::PowerTable(SqliteDatabase& database, const JsonService& json)
-    : json_(json),
-      insertRow_(database.prepare(
-          "INSERT INTO power_event (recorded_at, event_group, name, payload) VALUES (?1, ?2, ?3, ?4)")) {}
+PowerTable::PowerTable(SqliteDatabase& database) {
+  database.addRows("new_power_event", 4, *this);
+  insertRows_ = database.prepare(
+      "INSERT INTO power_event (recorded_at, event_group, name, payload)"
+      " SELECT c0, c1, c2, c3 FROM new_power_event");
+}
 
-bool PowerTable::insert(const PowerRow& row) {
-  const std::string payload = json_.compact(row.payload);
-  insertRow_.bind(1, row.recordedAt);
-  insertRow_.bind(2, row.group);
-  insertRow_.bind(3, row.name.view());
-  insertRow_.bind(4, payload);
-  return insertRow_.run();
+bool PowerTable::insert(const StoreBatch& batch) {
+  if (batch.power().empty()) return true;
+  batch_ = &batch;
+  const bool inserted = insertRows_.run();
+  batch_ = nullptr;
+  return inserted;
+}
+
+std::size_t PowerTable::rowCount() const { return batch_ == nullptr ? 0 : batch_->power().size(); }
+
+void PowerTable::read(std::size_t row, int column, SqliteCell& cell) const {
+  const StoreBatch::Power& event = batch_->power()[row];
+  switch (column) {
+    case 0:
+      return cell.set(event.recordedAt);
+    case 1:
+      return cell.set(event.group);
+    case 2:
+      return cell.set(batch_->text(event.name));
+    default:
+      return cell.set(batch_->text(event.payload));
+  }
 }
 
 }  // namespace tonewerk

@@ -2,25 +2,26 @@
 #pragma once
 
 #include "platform/linux/store/SqliteDatabase.h"
-#include "platform/linux/store/StoreRow.h"
+#include "platform/linux/store/SqliteRows.h"
+#include "platform/linux/store/StoreBatch.h"
 
 namespace tonewerk {
 
-class JsonService;
-
 // Writes the power events into an open report store. Used on the writer's thread, within its transactions.
-class PowerTable {
+class PowerTable final : private SqliteRows {
  public:
-  // `database` and `json` outlive it. Prepares its statement. Whether that succeeded shows in the first
-  // insert().
-  PowerTable(SqliteDatabase& database, const JsonService& json);
+  // `database` outlives it. Prepares its statement. Whether that succeeded shows in the first insert().
+  explicit PowerTable(SqliteDatabase& database);
 
-  // False on failure. The database then has the problem.
-  [[nodiscard]] bool insert(const PowerRow& row);
+  // Inserts the batch's power events. False on failure. The database then has the problem.
+  [[nodiscard]] bool insert(const StoreBatch& batch);
 
  private:
-  const JsonService& json_;
-  SqliteStatement insertRow_;
+  std::size_t rowCount() const override;
+  void read(std::size_t row, int column, SqliteCell& cell) const override;
+
+  SqliteStatement insertRows_;
+  const StoreBatch* batch_ = nullptr;  // while its rows are inserted
 };
 
 }  // namespace tonewerk

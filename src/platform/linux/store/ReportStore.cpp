@@ -44,11 +44,20 @@ ReportStore::~ReportStore() {
 }
 
 void ReportStore::recordEvent(double recordedAt, EventNames names, ValueMap payload) {
-  record(AnalyticsRow{recordedAt, std::move(names), std::move(payload)});
+  add(AnalyticsRow{recordedAt, std::move(names), std::move(payload)});
 }
 
-void ReportStore::record(StoreRow row) {
-  const bool hangs = queue_.add(std::move(row));
+void ReportStore::record(const MetricRow& row) { add(row); }
+
+void ReportStore::record(const PowerRow& row) { add(row); }
+
+void ReportStore::record(const RtcSessionRow& row) { add(row); }
+
+void ReportStore::record(const RtcMessageRow& row) { add(row); }
+
+template <typename Row>
+void ReportStore::add(const Row& row) {
+  const bool hangs = queue_.add(row);
   if (hangs) errorLog(log_, "writing to %s hangs; what does not fit is dropped", database_.path());
 }
 

@@ -7,8 +7,8 @@
 #include <string>
 #include <string_view>
 #include <thread>
-#include <vector>
 
+#include "platform/linux/store/StoreBatch.h"
 #include "platform/linux/store/StoreDatabase.h"
 #include "platform/linux/store/StoreQueue.h"
 
@@ -22,7 +22,7 @@ class PreferenceStore;
 // Keeps the reports on the device: in one SQLite file, written by one thread in batches, at most 100 ms late.
 // Any program can read it at any time. docs/store.md describes what is in it.
 //
-// Recording costs the caller a place in a bounded queue. The thread makes the JSON and runs the SQL. When the
+// Recording costs the caller the JSON and a place in a bounded queue. The thread runs the SQL. When the
 // queue is full because more is recorded than the disk takes, recording waits. When the file cannot be
 // written (a full disk, a missing directory, a file of a newer version) or the disk hangs, recording does not
 // wait: rows are kept while there is room and then dropped. Their number is logged when writing succeeds
@@ -49,8 +49,11 @@ class ReportStore {
 
   // Any thread. `recordedAt` in seconds since 1970.
   void recordEvent(double recordedAt, EventNames names, ValueMap payload);
-  // Any thread. A row of any table.
-  void record(StoreRow row);
+  // Any thread. A row of another table.
+  void record(const MetricRow& row);
+  void record(const PowerRow& row);
+  void record(const RtcSessionRow& row);
+  void record(const RtcMessageRow& row);
 
   // Any thread. The bounds are read again and applied at once, also when there is nothing to write.
   void readBoundsAgain();
@@ -66,6 +69,8 @@ class ReportStore {
   static constexpr std::chrono::milliseconds kFirstBackOff{500};
   static constexpr std::chrono::milliseconds kLongestBackOff{30'000};
 
+  template <typename Row>
+  void add(const Row& row);
   void run();
   [[nodiscard]] bool writeUntilDone();
   [[nodiscard]] bool write();
@@ -85,7 +90,7 @@ class ReportStore {
 
   // Used by the thread alone.
   StoreDatabase database_;
-  std::vector<StoreRow> batch_;
+  StoreBatch batch_;
   StoreBounds bounds_;
   std::chrono::nanoseconds boundsReadAt_{0};
   bool ageDue_ = false;  // the oldest rows are to be checked

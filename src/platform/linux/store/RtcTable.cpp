@@ -12,29 +12,47 @@ RtcTable::RtcTable(SqliteDatabase& database, const JsonService& json, std::uint6
       json_(json),
       fileNumber_(fileNumber),
       insertSession_(database.prepare(
-          "INSERT INTO rtc_session (started_at, session_info, user_info) VALUES (?1, ?2, ?3)")),
-      insertMessage_(
-          database.prepare("INSERT INTO rtc_message (sent_at, rtc_session, category, type, payload)"
-                           " VALUES (?1, ?2, ?3, ?4, ?5)")) {}
+          "INSERT INTO rtc_session (started_at, session_info, user_info) VALUES (?1, ?2, ?3)")) {
+  database.addRows("new_rtc_message", 5, *this);
+  insertMessages_ = database.prepare(
+      "INSERT INTO rtc_message (sent_at, rtc_session, category, type, payload)"
+      " SELECT c0, c1, c2, c3, c4 FROM new_rtc_message");
+}
 
 RtcTable::~RtcTable() {
   for (const auto& session : uncommitted_) session->place = {};
 }
 
-bool RtcTable::insert(const RtcSessionRow& row) { return has(*row.session) || insertSession(row.session); }
-
-bool RtcTable::insert(const RtcMessageRow& row) {
-  if (!has(*row.session) && !insertSession(row.session)) return false;
-  const std::string payload = json_.compact(row.payload);
-  insertMessage_.bind(1, row.sentAt);
-  insertMessage_.bind(2, row.session->place.identifier);
-  insertMessage_.bind(3, static_cast<std::int64_t>(row.category));
-  insertMessage_.bind(4, static_cast<std::int64_t>(row.type));
-  insertMessage_.bind(5, payload);
-  return insertMessage_.run();
+bool RtcTable::insert(const StoreBatch& batch) {
+  for (const auto& session : batch.sessions()) {
+    if (!has(*session) && !insertSession(session)) return false;
+  }
+  if (batch.rtcMessages().empty()) return true;
+  batch_ = &batch;
+  const bool inserted = insertMessages_.run();
+  batch_ = nullptr;
+  return inserted;
 }
 
 void RtcTable::committed() { uncommitted_.clear(); }
+
+std::size_t RtcTable::rowCount() const { return batch_ == nullptr ? 0 : batch_->rtcMessages().size(); }
+
+void RtcTable::read(std::size_t row, int column, SqliteCell& cell) const {
+  const StoreBatch::RtcMessage& message = batch_->rtcMessages()[row];
+  switch (column) {
+    case 0:
+      return cell.set(message.sentAt);
+    case 1:
+      return cell.set(batch_->sessions()[message.session]->place.identifier);
+    case 2:
+      return cell.set(static_cast<std::int64_t>(message.category));
+    case 3:
+      return cell.set(static_cast<std::int64_t>(message.type));
+    default:
+      return cell.set(batch_->text(message.payload));
+  }
+}
 
 bool RtcTable::has(const RtcSessionRecord& session) const { return session.place.file == fileNumber_; }
 

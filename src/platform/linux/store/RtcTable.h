@@ -6,7 +6,8 @@
 #include <vector>
 
 #include "platform/linux/store/SqliteDatabase.h"
-#include "platform/linux/store/StoreRow.h"
+#include "platform/linux/store/SqliteRows.h"
+#include "platform/linux/store/StoreBatch.h"
 
 namespace tonewerk {
 
@@ -17,7 +18,7 @@ class JsonService;
 //
 // When the file lacks a message's session, the session's row is written before the message's. That happens
 // when the session's own row was dropped, or when a new file was begun after it.
-class RtcTable {
+class RtcTable final : private SqliteRows {
  public:
   // `database` and `json` outlive it. `fileNumber` distinguishes this file from those that the process wrote
   // before. Prepares its statements. Whether that succeeded shows in the first insert().
@@ -25,15 +26,16 @@ class RtcTable {
   RtcTable(const RtcTable&) = delete;
   RtcTable& operator=(const RtcTable&) = delete;
   // Takes back the place of sessions that were not committed.
-  ~RtcTable();
+  ~RtcTable() override;
 
-  // False on failure. The database then has the problem.
-  [[nodiscard]] bool insert(const RtcSessionRow& row);
-  [[nodiscard]] bool insert(const RtcMessageRow& row);
+  // Inserts the batch's sessions and messages. False on failure. The database then has the problem.
+  [[nodiscard]] bool insert(const StoreBatch& batch);
   // The inserted rows are in the file.
   void committed();
 
  private:
+  std::size_t rowCount() const override;
+  void read(std::size_t row, int column, SqliteCell& cell) const override;
   bool has(const RtcSessionRecord& session) const;
   [[nodiscard]] bool insertSession(const std::shared_ptr<RtcSessionRecord>& session);
 
@@ -41,7 +43,8 @@ class RtcTable {
   const JsonService& json_;
   const std::uint64_t fileNumber_;
   SqliteStatement insertSession_;
-  SqliteStatement insertMessage_;
+  SqliteStatement insertMessages_;
+  const StoreBatch* batch_ = nullptr;  // while its messages are inserted
   std::vector<std::shared_ptr<RtcSessionRecord>> uncommitted_;
 };
 

@@ -12,6 +12,8 @@ struct sqlite3_stmt;
 
 namespace tonewerk {
 
+class SqliteRows;
+
 // A prepared statement of a SqliteDatabase, which outlives it. Used by one thread at a time.
 //
 // It is prepared once and used often: bind values to its parameters (?1, ?2, ...), step through the rows,
@@ -82,6 +84,9 @@ class SqliteDatabase {
   // Runs one or more statements and discards their rows.
   [[nodiscard]] bool run(const std::string& sql);
   [[nodiscard]] SqliteStatement prepare(const std::string& sql);
+  // Makes `rows` a table of this connection alone, with the columns c0, c1, ... They outlive the statements
+  // that read it. A failure shows when such a statement is prepared.
+  void addRows(const std::string& name, int columns, const SqliteRows& rows);
   // The first column of the first row. None on failure, and when there is no row.
   [[nodiscard]] std::optional<std::int64_t> number(const std::string& sql);
 

@@ -20,29 +20,18 @@ constexpr std::chrono::milliseconds kPatience{500};
 StoreDatabase::StoreDatabase(std::string directory, const JsonService& json)
     : directory_(std::move(directory)), path_(directory_ + "/" + std::string(kStoreFileName)), json_(json) {}
 
-StoreDatabase::Result StoreDatabase::write(std::span<const StoreRow> rows) {
+StoreDatabase::Result StoreDatabase::write(const StoreBatch& batch) {
   if (database_.isOpen() && database_.hasMoved()) close();
   const Result opened = open();
-  if (opened != Result::kDone || rows.empty()) return opened;
-  if (!database_.run("BEGIN IMMEDIATE")) return fail();
-  for (const StoreRow& row : rows) {
-    const bool inserted = std::visit([this](const auto& held) { return insert(held); }, row);
-    if (!inserted) return fail();
-  }
-  if (!database_.run("COMMIT")) return fail();
+  if (opened != Result::kDone || batch.empty()) return opened;
+  if (!begin_.run() || !insert(batch) || !commit_.run()) return fail();
   rtc_->committed();
   return Result::kDone;
 }
 
-bool StoreDatabase::insert(const AnalyticsRow& row) { return analytics_->insert(row); }
-
-bool StoreDatabase::insert(const MetricRow& row) { return metrics_->insert(row); }
-
-bool StoreDatabase::insert(const PowerRow& row) { return power_->insert(row); }
-
-bool StoreDatabase::insert(const RtcSessionRow& row) { return rtc_->insert(row); }
-
-bool StoreDatabase::insert(const RtcMessageRow& row) { return rtc_->insert(row); }
+bool StoreDatabase::insert(const StoreBatch& batch) {
+  return analytics_->insert(batch) && metrics_->insert(batch) && power_->insert(batch) && rtc_->insert(batch);
+}
 
 void StoreDatabase::setBounds(const StoreBounds& bounds) {
   bounds_ = bounds;
@@ -91,9 +80,11 @@ StoreDatabase::Result StoreDatabase::open() {
   // With this a commit costs no sync; each checkpoint makes one. A power cut loses the newest rows.
   if (!database_.run("PRAGMA journal_mode = WAL; PRAGMA synchronous = NORMAL")) return fail();
   applyBounds();
-  analytics_.emplace(database_, json_);
+  begin_ = database_.prepare("BEGIN IMMEDIATE");
+  commit_ = database_.prepare("COMMIT");
+  analytics_.emplace(database_);
   metrics_.emplace(database_);
-  power_.emplace(database_, json_);
+  power_.emplace(database_);
   rtc_.emplace(database_, json_, fileNumber_);
   trimmer_.emplace(database_);
   return Result::kDone;
@@ -142,6 +133,8 @@ void StoreDatabase::closeWith(std::string problem) {
 
 void StoreDatabase::close() {
   // Statements are destroyed before their database. An open transaction is undone.
+  begin_ = {};
+  commit_ = {};
   analytics_.reset();
   metrics_.reset();
   power_.reset();

@@ -3,7 +3,6 @@
 
 #include <cstdint>
 #include <optional>
-#include <span>
 #include <string>
 
 #include "platform/linux/store/AnalyticsTable.h"
@@ -11,7 +10,7 @@
 #include "platform/linux/store/PowerTable.h"
 #include "platform/linux/store/RtcTable.h"
 #include "platform/linux/store/SqliteDatabase.h"
-#include "platform/linux/store/StoreRow.h"
+#include "platform/linux/store/StoreBatch.h"
 #include "platform/linux/store/StoreTrimmer.h"
 
 namespace tonewerk {
@@ -33,7 +32,7 @@ class StoreDatabase {
 
   // Writes all rows or none of them. The operating system then has the rows; a power cut may lose the last
   // ones.
-  [[nodiscard]] Result write(std::span<const StoreRow> rows);
+  [[nodiscard]] Result write(const StoreBatch& batch);
   // The bounds of the next trims and of the write-ahead log.
   void setBounds(const StoreBounds& bounds);
   // Deletes rows that are too old at `now`, or enough rows to keep the file's size, in one slice of work.
@@ -51,11 +50,7 @@ class StoreDatabase {
  private:
   [[nodiscard]] Result open();
   [[nodiscard]] bool prepareFile();
-  [[nodiscard]] bool insert(const AnalyticsRow& row);
-  [[nodiscard]] bool insert(const MetricRow& row);
-  [[nodiscard]] bool insert(const PowerRow& row);
-  [[nodiscard]] bool insert(const RtcSessionRow& row);
-  [[nodiscard]] bool insert(const RtcMessageRow& row);
+  [[nodiscard]] bool insert(const StoreBatch& batch);
   void applyBounds();
   [[nodiscard]] Result resultOf(StoreTrimmer::Outcome outcome, bool& moreToDo);
   [[nodiscard]] Result fail();
@@ -68,6 +63,8 @@ class StoreDatabase {
   const JsonService& json_;
   SqliteDatabase database_;
   // Have a value while the file is open.
+  SqliteStatement begin_;
+  SqliteStatement commit_;
   std::optional<AnalyticsTable> analytics_;
   std::optional<MetricTable> metrics_;
   std::optional<PowerTable> power_;

@@ -5,10 +5,7 @@
 
 namespace tonewerk {
 
-bool StoreQueue::add(StoreRow row) {
-  MutexLock lock(mutex_);
-  const std::size_t bytes = bytesOf(row);
-  bool hasTimedOut = false;
+bool StoreQueue::waitForRoom(MutexLock& lock, std::size_t bytes, bool& hasTimedOut) {
   if (!fits(bytes) && waitsForRoom_) {
     const auto deadline = std::chrono::steady_clock::now() + limits_.hold;
     while (!fits(bytes) && waitsForRoom_ && room_.waitUntil(lock, deadline)) {
@@ -19,16 +16,25 @@ bool StoreQueue::add(StoreRow row) {
       room_.notifyAll();
     }
   }
-  if (!fits(bytes)) {
-    ++dropped_;
-    return hasTimedOut;
+  if (fits(bytes)) return true;
+  ++dropped_;
+  return false;
+}
+
+StoreBatch& StoreQueue::batchWithRoom() {
+  if (filling_.rows() >= limits_.batchRows || filling_.bytes() >= limits_.batchBytes) {
+    full_.push_back(std::move(filling_));
+    filling_ = std::exchange(spare_, StoreBatch());
   }
+  return filling_;
+}
+
+void StoreQueue::countAdded(std::size_t bytes) {
   const bool wasUrgent = isUrgent();
-  queued_.emplace_back(std::move(row));
+  ++queuedRows_;
   queuedBytes_ += bytes;
   ++added_;
-  if (queued_.size() == 1 || (isUrgent() && !wasUrgent)) work_.notifyOne();
-  return false;
+  if (queuedRows_ == 1 || (isUrgent() && !wasUrgent)) work_.notifyOne();
 }
 
 bool StoreQueue::flush(std::chrono::milliseconds timeout) {
@@ -50,25 +56,28 @@ void StoreQueue::stop() {
   work_.notifyOne();
 }
 
-bool StoreQueue::take(std::vector<StoreRow>& batch, bool wait) {
+bool StoreQueue::take(StoreBatch& batch, bool wait) {
   batch.clear();
   MutexLock lock(mutex_);
   if (wait) {
-    while (queued_.empty() && !stopped_ && !isWoken_) work_.wait(lock);
+    while (queuedRows_ == 0 && !stopped_ && !isWoken_) work_.wait(lock);
     const auto deadline = std::chrono::steady_clock::now() + limits_.gather;
     while (!isUrgent() && work_.waitUntil(lock, deadline)) {
     }
   }
   isWoken_ = false;
-  takenBytes_ = 0;
-  while (!queued_.empty() && batch.size() < limits_.batchRows && takenBytes_ < limits_.batchBytes) {
-    takenBytes_ += bytesOf(queued_.front());
-    batch.push_back(std::move(queued_.front()));
-    queued_.pop_front();
+  if (full_.empty()) {
+    std::swap(batch, filling_);
+  } else {
+    std::swap(batch, full_.front());
+    spare_ = std::move(full_.front());
+    full_.pop_front();
   }
-  takenRows_ = batch.size();
+  takenRows_ = batch.rows();
+  takenBytes_ = batch.bytes();
+  queuedRows_ -= takenRows_;
   queuedBytes_ -= takenBytes_;
-  leftOver_ = !queued_.empty();
+  leftOver_ = queuedRows_ > 0;
   return !batch.empty() || !stopped_;
 }
 
@@ -115,17 +124,17 @@ std::uint64_t StoreQueue::takeDropped() {
 
 std::uint64_t StoreQueue::lost() const {
   const MutexLock lock(mutex_);
-  return queued_.size() + takenRows_ + dropped_;
+  return queuedRows_ + takenRows_ + dropped_;
 }
 
 bool StoreQueue::fits(std::size_t bytes) const {
-  const std::size_t rows = queued_.size() + takenRows_;
+  const std::size_t rows = queuedRows_ + takenRows_;
   // A row that is larger than all the room passes when the queue is empty.
   return rows == 0 || (rows < limits_.rows && queuedBytes_ + takenBytes_ + bytes <= limits_.bytes);
 }
 
 bool StoreQueue::isUrgent() const {
-  return stopped_ || isWoken_ || leftOver_ || openFlushes_ > 0 || queued_.size() >= limits_.batchRows ||
+  return stopped_ || isWoken_ || leftOver_ || openFlushes_ > 0 || queuedRows_ >= limits_.batchRows ||
          queuedBytes_ >= limits_.bytes / 4;
 }
 

@@ -5,9 +5,8 @@
 #include <cstddef>
 #include <cstdint>
 #include <deque>
-#include <vector>
 
-#include "platform/linux/store/StoreRow.h"
+#include "platform/linux/store/StoreBatch.h"
 #include "values/Mutex.h"
 
 namespace tonewerk {
@@ -18,6 +17,9 @@ namespace tonewerk {
 //                                             |  ^
 //                                     failed()v  |  after pause()
 //                                          kept by the writer
+//
+// Rows wait in batches, as they will be written: a batch is full when it has the rows or bytes of one
+// transaction. The writer takes whole batches, and their memory is used again for later rows.
 //
 // Rows count against the bounds until they are committed. While writing succeeds, add() waits for room. After
 // failed(), or when the writer makes no progress for the hold time, add() does not wait until the next
@@ -38,8 +40,20 @@ class StoreQueue {
 
   explicit StoreQueue(const Limits& limits) : limits_(limits) {}
 
-  // Any thread. True when this row waited for the whole hold time, so that from now on rows are dropped.
-  [[nodiscard]] bool add(StoreRow row);
+  // Any thread. `row` is of any type that StoreBatch takes. True when this row waited for the whole hold
+  // time, so that from now on rows are dropped.
+  template <typename Row>
+  [[nodiscard]] bool add(const Row& row) {
+    const StoreRowText text(row);  // the JSON is made without the lock
+    const std::size_t bytes = StoreBatch::bytesOf(row, text);
+    MutexLock lock(mutex_);
+    bool hasTimedOut = false;
+    if (waitForRoom(lock, bytes, hasTimedOut)) {
+      batchWithRoom().add(row, text);
+      countAdded(bytes);
+    }
+    return hasTimedOut;
+  }
 
   // Any thread. Waits until everything added before is committed. False when the first try to write that
   // begins after the call fails, or after `timeout`.
@@ -52,9 +66,9 @@ class StoreQueue {
   void stop();
 
   // The functions from here to pause() are for the writer's thread. take() replaces `batch`, whose rows are
-  // committed, by the next rows. Without `wait` it returns at once, perhaps with none. False when stopped and
+  // committed, by the next batch. Without `wait` it returns at once, perhaps with none. False when stopped and
   // empty.
-  [[nodiscard]] bool take(std::vector<StoreRow>& batch, bool wait);
+  [[nodiscard]] bool take(StoreBatch& batch, bool wait);
   // A try to write the batch begins.
   void beginAttempt();
   // The batch is in the file.
@@ -72,6 +86,11 @@ class StoreQueue {
   std::uint64_t lost() const;
 
  private:
+  // False when the row is dropped. `hasTimedOut` is set when it waited for the whole hold time.
+  bool waitForRoom(MutexLock& lock, std::size_t bytes, bool& hasTimedOut) REQUIRES(mutex_);
+  // The batch for the next row.
+  StoreBatch& batchWithRoom() REQUIRES(mutex_);
+  void countAdded(std::size_t bytes) REQUIRES(mutex_);
   bool fits(std::size_t bytes) const REQUIRES(mutex_);
   bool isUrgent() const REQUIRES(mutex_);
 
@@ -81,8 +100,11 @@ class StoreQueue {
   Condition room_;      // add() waits for room
   Condition progress_;  // flush() waits for commits
 
-  std::deque<StoreRow> queued_ GUARDED_BY(mutex_);
-  bool leftOver_ GUARDED_BY(mutex_) = false;  // rows that did not fit into the last batch
+  std::deque<StoreBatch> full_ GUARDED_BY(mutex_);  // the oldest rows
+  StoreBatch filling_ GUARDED_BY(mutex_);           // the rows after them
+  StoreBatch spare_ GUARDED_BY(mutex_);             // empty, and perhaps with memory for later rows
+  std::size_t queuedRows_ GUARDED_BY(mutex_) = 0;   // in full_ and filling_
+  bool leftOver_ GUARDED_BY(mutex_) = false;        // rows that did not fit into the last batch
   std::size_t queuedBytes_ GUARDED_BY(mutex_) = 0;
   std::size_t takenRows_ GUARDED_BY(mutex_) = 0;
   std::size_t takenBytes_ GUARDED_BY(mutex_) = 0;

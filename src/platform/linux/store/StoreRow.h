@@ -5,20 +5,26 @@
 #include <cstdint>
 #include <memory>
 #include <string>
-#include <variant>
 
 #include "platform/Metricon.h"
 #include "values/Value.h"
 
 namespace tonewerk {
 
+// Costs little: the names know their hashes.
+struct EventNamesHash {
+  std::size_t operator()(const EventNames& names) const {
+    return names.first.hash() * 31 + names.second.hash();
+  }
+};
+
+// What is recorded, one type for each of the store's tables.
+
 // An analytics event: one payload under one or two names.
 struct AnalyticsRow {
   double recordedAt = 0.0;  // seconds since 1970
   EventNames names;
   ValueMap payload;
-
-  std::size_t bytes() const { return sizeof(AnalyticsRow) + payload.bytes(); }
 };
 
 // A posted metric record.
@@ -26,8 +32,6 @@ struct MetricRow {
   double postedAt = 0.0;  // seconds since 1970
   std::uint32_t identifier = 0;
   std::string record;  // bytes
-
-  std::size_t bytes() const { return sizeof(MetricRow) + record.size(); }
 };
 
 // An event of the power log.
@@ -36,8 +40,6 @@ struct PowerRow {
   std::int64_t group = 0;
   SharedString name;
   ValueMap payload;
-
-  std::size_t bytes() const { return sizeof(PowerRow) + payload.bytes(); }
 };
 
 // A real-time-communication session. The rows of its messages share it, because each needs its identifier.
@@ -57,10 +59,6 @@ struct RtcSessionRecord {
 
 struct RtcSessionRow {
   std::shared_ptr<RtcSessionRecord> session;
-
-  std::size_t bytes() const {
-    return sizeof(RtcSessionRecord) + session->sessionInfo.bytes() + session->userInfo.bytes();
-  }
 };
 
 // One message of such a session.
@@ -70,15 +68,6 @@ struct RtcMessageRow {
   std::uint16_t category = 0;
   std::uint16_t type = 0;
   ValueMap payload;
-
-  std::size_t bytes() const { return sizeof(RtcMessageRow) + payload.bytes(); }
 };
-
-// A row of one of the store's tables.
-using StoreRow = std::variant<AnalyticsRow, MetricRow, PowerRow, RtcSessionRow, RtcMessageRow>;
-
-inline std::size_t bytesOf(const StoreRow& row) {
-  return std::visit([](const auto& held) { return held.bytes(); }, row);
-}
 
 }  // namespace tonewerk

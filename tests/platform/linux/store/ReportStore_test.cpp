@@ -173,6 +173,23 @@ TEST_F(ReportStoreTest, KeepsMetricRecordsByteForByteBetweenEvents) {
   EXPECT_THAT(events(), SizeIs(2));
 }
 
+TEST_F(ReportStoreTest, KeepsTextsOfAllSizes) {
+  open();
+  std::vector<std::string> expected;
+  for (const std::size_t size :
+       std::initializer_list<std::size_t>{0, 1, 100, 8100, 8192, 600'000, 3'000'000, 2}) {
+    const std::string text(size, 'x');
+    record("com.orvane.n", {{"text", text}});
+    store_->record(MetricRow{clock_.now(), 1, text});
+    expected.push_back(R"({"text":")" + text + R"("})");
+  }
+  ASSERT_TRUE(flush());
+  EXPECT_EQ(payloads(), expected);
+  EXPECT_EQ(number("SELECT sum(length(record)) FROM metric"),
+            0 + 1 + 100 + 8100 + 8192 + 600'000 + 3'000'000 + 2);
+  EXPECT_EQ(number("SELECT count(*) FROM metric WHERE typeof(record) = 'blob'"), 8);
+}
+
 TEST_F(ReportStoreTest, UsesKnownNamesAgainAfterARestart) {
   for (int run = 0; run < 2; ++run) {
     open();
@@ -555,6 +572,36 @@ TEST_F(ReportStoreTest, KeepsPowerEventsBetweenAnalyticsEventsInTheirOrder) {
   EXPECT_THAT(events(), SizeIs(600));
   EXPECT_EQ(number("SELECT count(*) FROM power_event"), 600);
   EXPECT_EQ(number("SELECT count(*) FROM power_event WHERE payload ->> 'n' <> id - 1"), 0);
+}
+
+TEST_F(ReportStoreTest, KeepsTheOrderWithinEachTableWhenRowsOfAllTablesAreMixed) {
+  ReportStore::Limits limits;
+  limits.batchRows = 70;
+  open(limits);
+  std::vector<std::shared_ptr<RtcSessionRecord>> sessions;
+  for (int n = 0; n < 1000; ++n) {
+    record(n % 2 == 0 ? EventNames("a", "b") : EventNames("a"), {{"n", n}});
+    store_->record(MetricRow{clock_.now(), static_cast<std::uint32_t>(n), "record"});
+    recordPower(n);
+    if (n % 100 == 0) {
+      sessions.push_back(std::make_shared<RtcSessionRecord>());
+      sessions.back()->startedAt = n;
+      store_->record(RtcSessionRow{sessions.back()});
+    }
+    const auto& session = sessions[static_cast<std::size_t>(n) % sessions.size()];
+    store_->record(RtcMessageRow{clock_.now(), session, 4, 1, {{"n", n}, {"session", session->startedAt}}});
+  }
+  ASSERT_TRUE(flush());
+
+  EXPECT_EQ(number("SELECT count(*) FROM analytics_row WHERE payload ->> 'n' = id - 1"), 1000);
+  EXPECT_EQ(number("SELECT count(*) FROM analytics_event"), 1500);
+  EXPECT_EQ(number("SELECT count(*) FROM metric WHERE identifier = id - 1 AND record = x'7265636f7264'"),
+            1000);
+  EXPECT_EQ(number("SELECT count(*) FROM power_event WHERE payload ->> 'n' = id - 1"), 1000);
+  EXPECT_EQ(number("SELECT count(*) FROM rtc_session WHERE started_at = 100 * (id - 1)"), 10);
+  EXPECT_EQ(number("SELECT count(*) FROM rtc_message AS m JOIN rtc_session AS s ON s.id = m.rtc_session"
+                   " WHERE m.payload ->> 'n' = m.id - 1 AND m.payload ->> 'session' = s.started_at"),
+            1000);
 }
 
 TEST_F(ReportStoreTest, DeletesPowerEventsThatAreOlderThanTheBound) {

@@ -25,7 +25,13 @@ std::shared_ptr<RtcSessionRecord> makeSession(int number) {
 
 class RtcTableTest : public testing::Test {
  protected:
-  Result write(std::vector<StoreRow> rows) { return store_.write(rows); }
+  // Writes the rows in one transaction.
+  template <typename... Rows>
+  Result write(const Rows&... rows) {
+    StoreBatch batch;
+    (batch.add(rows, StoreRowText(rows)), ...);
+    return store_.write(batch);
+  }
   static RtcMessageRow messageOf(const std::shared_ptr<RtcSessionRecord>& session, int number) {
     return {0.5, session, 4, 65535, {{"n", number}}};
   }
@@ -59,9 +65,9 @@ class RtcTableTest : public testing::Test {
 TEST_F(RtcTableTest, AMessageNamesItsSession) {
   const auto first = makeSession(1);
   const auto second = makeSession(2);
-  EXPECT_EQ(write({RtcSessionRow{first}, RtcSessionRow{second}, messageOf(second, 1), messageOf(first, 2)}),
+  EXPECT_EQ(write(RtcSessionRow{first}, RtcSessionRow{second}, messageOf(second, 1), messageOf(first, 2)),
             Result::kDone);
-  EXPECT_EQ(write({messageOf(second, 3)}), Result::kDone);
+  EXPECT_EQ(write(messageOf(second, 3)), Result::kDone);
   EXPECT_THAT(sessions(),
               ElementsAre(R"(1 1.0 {"number":1} {"client":"c"})", R"(2 2.0 {"number":2} {"client":"c"})"));
   EXPECT_THAT(messages(), ElementsAre(R"(2 {"n":1})", R"(1 {"n":2})", R"(2 {"n":3})"));
@@ -70,8 +76,8 @@ TEST_F(RtcTableTest, AMessageNamesItsSession) {
 
 TEST_F(RtcTableTest, AMessageWritesTheDroppedRowOfItsSession) {
   const auto session = makeSession(1);
-  EXPECT_EQ(write({messageOf(session, 1)}), Result::kDone);
-  EXPECT_EQ(write({messageOf(session, 2)}), Result::kDone);
+  EXPECT_EQ(write(messageOf(session, 1)), Result::kDone);
+  EXPECT_EQ(write(messageOf(session, 2)), Result::kDone);
   EXPECT_THAT(sessions(), ElementsAre(R"(1 1.0 {"number":1} {"client":"c"})"));
   EXPECT_THAT(messages(), ElementsAre(R"(1 {"n":1})", R"(1 {"n":2})"));
 }
@@ -79,11 +85,11 @@ TEST_F(RtcTableTest, AMessageWritesTheDroppedRowOfItsSession) {
 TEST_F(RtcTableTest, ANewFileGetsTheSessionAgain) {
   const auto earlier = makeSession(1);
   const auto session = makeSession(2);
-  EXPECT_EQ(write({RtcSessionRow{earlier}, RtcSessionRow{session}, messageOf(session, 1)}), Result::kDone);
+  EXPECT_EQ(write(RtcSessionRow{earlier}, RtcSessionRow{session}, messageOf(session, 1)), Result::kDone);
   std::filesystem::remove(directory_.path("reports.db"));
   std::filesystem::remove(directory_.path("reports.db-wal"));
   std::filesystem::remove(directory_.path("reports.db-shm"));
-  EXPECT_EQ(write({messageOf(session, 2)}), Result::kDone);
+  EXPECT_EQ(write(messageOf(session, 2)), Result::kDone);
   EXPECT_THAT(sessions(), ElementsAre(R"(1 2.0 {"number":2} {"client":"c"})"));
   EXPECT_THAT(messages(), ElementsAre(R"(1 {"n":2})"));
 }
@@ -91,7 +97,7 @@ TEST_F(RtcTableTest, ANewFileGetsTheSessionAgain) {
 TEST_F(RtcTableTest, AnUndoneTransactionHasNoEffect) {
   const auto kept = makeSession(1);
   const auto undone = makeSession(2);
-  ASSERT_EQ(write({RtcSessionRow{kept}}), Result::kDone);
+  ASSERT_EQ(write(RtcSessionRow{kept}), Result::kDone);
   {
     SqliteDatabase otherWriter;
     ASSERT_TRUE(otherWriter.open(directory_.path("reports.db"), SqliteDatabase::Mode::kReadWrite,
@@ -100,7 +106,7 @@ TEST_F(RtcTableTest, AnUndoneTransactionHasNoEffect) {
         otherWriter.run("CREATE TRIGGER refuse BEFORE INSERT ON rtc_message"
                         " BEGIN SELECT RAISE(ABORT, 'no'); END"));
   }
-  EXPECT_EQ(write({RtcSessionRow{undone}, messageOf(undone, 1)}), Result::kFailed);
+  EXPECT_EQ(write(RtcSessionRow{undone}, messageOf(undone, 1)), Result::kFailed);
   EXPECT_EQ(undone->place.file, 0U);
   {
     SqliteDatabase otherWriter;
@@ -108,7 +114,7 @@ TEST_F(RtcTableTest, AnUndoneTransactionHasNoEffect) {
                                  std::chrono::seconds(30)));
     ASSERT_TRUE(otherWriter.run("DROP TRIGGER refuse"));
   }
-  EXPECT_EQ(write({RtcSessionRow{undone}, messageOf(undone, 1), messageOf(kept, 2)}), Result::kDone);
+  EXPECT_EQ(write(RtcSessionRow{undone}, messageOf(undone, 1), messageOf(kept, 2)), Result::kDone);
   EXPECT_THAT(rows("SELECT started_at FROM rtc_session ORDER BY id", 1), ElementsAre("1.0", "2.0"));
   EXPECT_THAT(messages(), ElementsAre(R"(2 {"n":1})", R"(1 {"n":2})"));
 }

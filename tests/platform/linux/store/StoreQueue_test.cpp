@@ -3,14 +3,14 @@
 
 #include <future>
 #include <gmock/gmock.h>
+#include <string>
 #include <vector>
 
 namespace tonewerk {
 namespace {
 
 using std::chrono::milliseconds;
-using testing::IsEmpty;
-using testing::SizeIs;
+using testing::ElementsAre;
 
 constexpr milliseconds kLongEnough{30'000};
 
@@ -27,7 +27,7 @@ StoreQueue::Limits small() {
 class StoreQueueTest : public testing::Test {
  protected:
   StoreQueue queue_{small()};
-  std::vector<StoreRow> batch_;
+  StoreBatch batch_;
 };
 
 TEST_F(StoreQueueTest, AddWaitsUntilThereIsRoom) {
@@ -35,11 +35,11 @@ TEST_F(StoreQueueTest, AddWaitsUntilThereIsRoom) {
   EXPECT_FALSE(queue_.add(row(1)));
   auto third = std::async(std::launch::async, [&] { return queue_.add(row(2)); });
   ASSERT_TRUE(queue_.take(batch_, true));
-  EXPECT_THAT(batch_, SizeIs(2));
+  EXPECT_EQ(batch_.rows(), 2U);
   queue_.committed();
   EXPECT_FALSE(third.get());
   ASSERT_TRUE(queue_.take(batch_, true));
-  EXPECT_THAT(batch_, SizeIs(1));
+  EXPECT_EQ(batch_.rows(), 1U);
   EXPECT_EQ(queue_.takeDropped(), 0U);
   queue_.committed();
 }
@@ -55,7 +55,7 @@ TEST_F(StoreQueueTest, CountsRowsUntilTheyAreCommitted) {
   queue_.committed();
   EXPECT_FALSE(queue_.add(row(3)));
   ASSERT_TRUE(queue_.take(batch_, true));
-  EXPECT_THAT(batch_, SizeIs(1));
+  EXPECT_EQ(batch_.rows(), 1U);
 }
 
 TEST_F(StoreQueueTest, AddStopsWaitingWhenWritingFails) {
@@ -75,7 +75,65 @@ TEST_F(StoreQueueTest, TakesARowThatIsLargerThanItsBoundAlone) {
   StoreQueue queue(limits);
   EXPECT_FALSE(queue.add(row(0)));
   ASSERT_TRUE(queue.take(batch_, true));
-  EXPECT_THAT(batch_, SizeIs(1));
+  EXPECT_EQ(batch_.rows(), 1U);
+}
+
+TEST_F(StoreQueueTest, MoreThanABatchOfRowsIsTakenInBatchesInTheOrderOfRecording) {
+  StoreQueue::Limits limits;
+  limits.batchRows = 3;
+  StoreQueue queue(limits);
+  std::vector<std::string> taken;
+  std::vector<std::size_t> sizes;
+  int added = 0;
+  // The batches come back to the queue and are used again.
+  for (int round = 0; round < 4; ++round) {
+    for (int n = 0; n < 8; ++n) EXPECT_FALSE(queue.add(row(added++)));
+    while (queue.take(batch_, false) && !batch_.empty()) {
+      sizes.push_back(batch_.rows());
+      for (const StoreBatch::Analytics& event : batch_.analytics()) {
+        taken.emplace_back(batch_.text(event.payload));
+      }
+      queue.committed();
+    }
+  }
+  EXPECT_THAT(sizes, ElementsAre(3, 3, 2, 3, 3, 2, 3, 3, 2, 3, 3, 2));
+  std::vector<std::string> expected;
+  expected.reserve(taken.size());
+  for (int n = 0; n < added; ++n) expected.push_back("{\"n\":" + std::to_string(n) + "}");
+  EXPECT_EQ(taken, expected);
+}
+
+TEST_F(StoreQueueTest, ABatchEndsWithTheRowThatReachesItsBytes) {
+  StoreQueue::Limits limits;
+  limits.batchBytes = 2000;
+  StoreQueue queue(limits);
+  for (int n = 0; n < 4; ++n)
+    EXPECT_FALSE(queue.add(AnalyticsRow{0.0, "a", {{"t", std::string(1500, 'x')}}}));
+  EXPECT_FALSE(queue.add(AnalyticsRow{0.0, "a", {{"t", std::string(9000, 'x')}}}));
+  std::vector<std::size_t> sizes;
+  while (queue.take(batch_, false) && !batch_.empty()) {
+    sizes.push_back(batch_.rows());
+    queue.committed();
+  }
+  EXPECT_THAT(sizes, ElementsAre(2, 2, 1));
+}
+
+TEST_F(StoreQueueTest, CountsBytesUntilTheyAreCommitted) {
+  StoreQueue::Limits limits = small();
+  limits.rows = 100;
+  const AnalyticsRow kilobyte{0.0, "a", {{"t", std::string(1000, 'x')}}};
+  limits.bytes = 2 * StoreBatch::bytesOf(kilobyte, StoreRowText(kilobyte));
+  StoreQueue queue(limits);
+  queue.failed();  // nothing waits
+  EXPECT_FALSE(queue.add(kilobyte));
+  ASSERT_TRUE(queue.take(batch_, true));
+  EXPECT_FALSE(queue.add(kilobyte));
+  EXPECT_EQ(queue.takeDropped(), 0U);  // two fit exactly
+  EXPECT_FALSE(queue.add(kilobyte));
+  EXPECT_EQ(queue.takeDropped(), 1U);
+  queue.committed();
+  EXPECT_FALSE(queue.add(kilobyte));
+  EXPECT_EQ(queue.takeDropped(), 0U);
 }
 
 TEST_F(StoreQueueTest, AddWaitsNoLongerThanTheHoldTimeAndReportsThatOnce) {
@@ -123,23 +181,23 @@ TEST_F(StoreQueueTest, ReturnsTheRemainingRowsBeforeItStops) {
   EXPECT_FALSE(queue_.add(row(0)));
   queue_.stop();
   EXPECT_TRUE(queue_.take(batch_, true));
-  EXPECT_THAT(batch_, SizeIs(1));
+  EXPECT_EQ(batch_.rows(), 1U);
   queue_.committed();
   EXPECT_FALSE(queue_.take(batch_, true));
-  EXPECT_THAT(batch_, IsEmpty());
+  EXPECT_EQ(batch_.rows(), 0U);
   EXPECT_FALSE(queue_.pause(kLongEnough));
 }
 
 TEST_F(StoreQueueTest, ANudgedWriterReturnsWithoutRows) {
   queue_.wakeWriter();
   ASSERT_TRUE(queue_.take(batch_, true));
-  EXPECT_THAT(batch_, IsEmpty());
+  EXPECT_EQ(batch_.rows(), 0U);
   queue_.committed();
 
   auto writer = std::async(std::launch::async, [this] { return queue_.take(batch_, true); });
   queue_.wakeWriter();
   EXPECT_TRUE(writer.get());
-  EXPECT_THAT(batch_, IsEmpty());
+  EXPECT_EQ(batch_.rows(), 0U);
 }
 
 }  // namespace

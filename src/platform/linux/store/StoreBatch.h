@@ -1,0 +1,132 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <array>
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+#include <span>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "platform/linux/store/StoreRow.h"
+
+namespace tonewerk {
+
+// The text that a batch keeps of one row: its payload as JSON, after a name that is the row's own. It is made
+// before the row is added, so that no lock is held meanwhile and its size is known.
+class StoreRowText {
+ public:
+  // Writes into a buffer of the calling thread, which must not make another one while this one lives.
+  explicit StoreRowText(const AnalyticsRow& row);
+  explicit StoreRowText(const MetricRow& row);
+  explicit StoreRowText(const PowerRow& row);
+  explicit StoreRowText(const RtcSessionRow& row);
+  explicit StoreRowText(const RtcMessageRow& row);
+  StoreRowText(const StoreRowText&) = delete;
+  StoreRowText& operator=(const StoreRowText&) = delete;
+  // Keeps the buffer for the next row, unless it is large.
+  ~StoreRowText();
+
+  std::string_view view() const { return text_; }
+
+ private:
+  static constexpr std::size_t kKeptBytes = 64 << 10;
+
+  std::string& text_;
+};
+
+// The rows of one transaction: small rows for each table, and one text that holds all their payloads. The
+// rows of a table are in the order of recording. A batch is cleared and used again, so that adding a row
+// seldom allocates. Used by one thread at a time.
+//
+// No values are kept, because freeing memory on another thread than it was allocated on is slow.
+class StoreBatch {
+ public:
+  // A part of the text.
+  struct Part {
+    std::size_t begin = 0;
+    std::size_t size = 0;
+  };
+  struct Analytics {
+    double recordedAt = 0.0;
+    std::size_t names = 0;  // index in names()
+    Part payload;
+  };
+  struct Metric {
+    double postedAt = 0.0;
+    std::uint32_t identifier = 0;
+    Part record;
+  };
+  struct Power {
+    double recordedAt = 0.0;
+    std::int64_t group = 0;
+    Part name;
+    Part payload;
+  };
+  struct RtcMessage {
+    double sentAt = 0.0;
+    std::size_t session = 0;  // index in sessions()
+    std::uint16_t category = 0;
+    std::uint16_t type = 0;
+    Part payload;
+  };
+
+  // The bytes that a row takes in a batch.
+  static std::size_t bytesOf(const AnalyticsRow& row, const StoreRowText& text);
+  static std::size_t bytesOf(const MetricRow& row, const StoreRowText& text);
+  static std::size_t bytesOf(const PowerRow& row, const StoreRowText& text);
+  static std::size_t bytesOf(const RtcSessionRow& row, const StoreRowText& text);
+  static std::size_t bytesOf(const RtcMessageRow& row, const StoreRowText& text);
+
+  void add(const AnalyticsRow& row, const StoreRowText& text);
+  void add(const MetricRow& row, const StoreRowText& text);
+  void add(const PowerRow& row, const StoreRowText& text);
+  void add(const RtcSessionRow& row, const StoreRowText& text);
+  void add(const RtcMessageRow& row, const StoreRowText& text);
+
+  // Removes all rows. Keeps the memory, unless the text was exceptionally large.
+  void clear();
+
+  bool empty() const { return rows_ == 0; }
+  // Of all tables.
+  std::size_t rows() const { return rows_; }
+  std::size_t bytes() const { return bytes_; }
+
+  std::span<const Analytics> analytics() const { return analytics_; }
+  std::span<const Metric> metrics() const { return metrics_; }
+  std::span<const Power> power() const { return power_; }
+  std::span<const RtcMessage> rtcMessages() const { return rtcMessages_; }
+  // What the analytics rows are called. The same names may be there more than once.
+  std::span<const EventNames> names() const { return names_; }
+  // The sessions of session rows and message rows, in the order of recording. One may be there more than
+  // once.
+  std::span<const std::shared_ptr<RtcSessionRecord>> sessions() const { return sessions_; }
+  // Valid until the next add() or clear().
+  std::string_view text(Part part) const { return std::string_view(text_).substr(part.begin, part.size); }
+
+ private:
+  // Batches of usual rows are smaller.
+  static constexpr std::size_t kKeptBytes = 1 << 20;
+  // Where the newest names with a hash are in names_: so the same names are mostly there once.
+  static constexpr std::size_t kNameSlots = 256;
+
+  Part append(std::string_view text);
+  void count(std::size_t bytes);
+  std::size_t indexOf(const EventNames& names);
+  std::size_t indexOf(const std::shared_ptr<RtcSessionRecord>& session);
+
+  std::vector<Analytics> analytics_;
+  std::vector<Metric> metrics_;
+  std::vector<Power> power_;
+  std::vector<RtcMessage> rtcMessages_;
+  std::vector<EventNames> names_;
+  std::array<std::uint32_t, kNameSlots> nameSlots_{};  // index in names_ plus 1, or 0
+  std::vector<std::shared_ptr<RtcSessionRecord>> sessions_;
+  std::string text_;
+  std::size_t rows_ = 0;
+  std::size_t bytes_ = 0;
+};
+
+}  // namespace tonewerk

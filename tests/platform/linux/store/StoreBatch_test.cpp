@@ -1,0 +1,193 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/store/StoreBatch.h"
+
+#include <gmock/gmock.h>
+#include <rapidcheck/gtest.h>
+#include <string>
+#include <variant>
+#include <vector>
+
+namespace tonewerk {
+namespace {
+
+using testing::ElementsAre;
+
+using AnyRow = std::variant<AnalyticsRow, MetricRow, PowerRow, RtcSessionRow, RtcMessageRow>;
+
+template <typename Row>
+void add(StoreBatch& batch, const Row& row) {
+  batch.add(row, StoreRowText(row));
+}
+
+// What a batch is expected to hold: a description of each row, for each table.
+struct Expected {
+  std::vector<std::string> analytics;
+  std::vector<std::string> metrics;
+  std::vector<std::string> power;
+  std::vector<std::string> messages;
+  std::size_t rows = 0;
+
+  void add(const AnalyticsRow& row) {
+    analytics.push_back(textOf(row.recordedAt) + "|" + row.names.first.string() + "|" +
+                        row.names.second.string() + "|" + row.payload.text());
+  }
+  void add(const MetricRow& row) {
+    metrics.push_back(textOf(row.postedAt) + "|" + std::to_string(row.identifier) + "|" + row.record);
+  }
+  void add(const PowerRow& row) {
+    power.push_back(textOf(row.recordedAt) + "|" + std::to_string(row.group) + "|" + row.name.string() + "|" +
+                    row.payload.text());
+  }
+  void add(const RtcSessionRow&) {}
+  void add(const RtcMessageRow& row) {
+    messages.push_back(textOf(row.sentAt) + "|" + textOf(row.session->startedAt) + "|" +
+                       std::to_string(row.category) + "|" + std::to_string(row.type) + "|" +
+                       row.payload.text());
+  }
+};
+
+Expected contentsOf(const StoreBatch& batch) {
+  Expected found;
+  const auto text = [&](StoreBatch::Part part) { return std::string(batch.text(part)); };
+  for (const StoreBatch::Analytics& row : batch.analytics()) {
+    const EventNames& names = batch.names()[row.names];
+    found.analytics.push_back(textOf(row.recordedAt) + "|" + names.first.string() + "|" +
+                              names.second.string() + "|" + text(row.payload));
+  }
+  for (const StoreBatch::Metric& row : batch.metrics()) {
+    found.metrics.push_back(textOf(row.postedAt) + "|" + std::to_string(row.identifier) + "|" +
+                            text(row.record));
+  }
+  for (const StoreBatch::Power& row : batch.power()) {
+    found.power.push_back(textOf(row.recordedAt) + "|" + std::to_string(row.group) + "|" + text(row.name) +
+                          "|" + text(row.payload));
+  }
+  for (const StoreBatch::RtcMessage& row : batch.rtcMessages()) {
+    found.messages.push_back(textOf(row.sentAt) + "|" + textOf(batch.sessions()[row.session]->startedAt) +
+                             "|" + std::to_string(row.category) + "|" + std::to_string(row.type) + "|" +
+                             text(row.payload));
+  }
+  found.rows = batch.rows();
+  return found;
+}
+
+void expectEqual(const Expected& found, const Expected& expected) {
+  RC_ASSERT(found.analytics == expected.analytics);
+  RC_ASSERT(found.metrics == expected.metrics);
+  RC_ASSERT(found.power == expected.power);
+  RC_ASSERT(found.messages == expected.messages);
+  RC_ASSERT(found.rows == expected.rows);
+}
+
+// Rows of all tables, with more names and sessions than the batch looks for.
+class RandomRows {
+ public:
+  RandomRows() {
+    for (int session = 0; session < 40; ++session) {
+      sessions_.push_back(std::make_shared<RtcSessionRecord>());
+      sessions_.back()->startedAt = session;
+    }
+  }
+
+  AnyRow next() {
+    const double time = *rc::gen::inRange(0, 1000) / 4.0;
+    const ValueMap payload{{"text", *rc::gen::arbitrary<std::string>()}};
+    const auto& session = sessions_[*rc::gen::inRange<std::size_t>(0, sessions_.size())];
+    const std::string name = "name" + std::to_string(*rc::gen::inRange(0, 600));
+    switch (*rc::gen::inRange(0, 6)) {
+      case 0:
+        return MetricRow{time, *rc::gen::arbitrary<std::uint32_t>(), *rc::gen::arbitrary<std::string>()};
+      case 1:
+        return PowerRow{time, *rc::gen::inRange<std::int64_t>(-5, 50), name, payload};
+      case 2:
+        return RtcSessionRow{session};
+      case 3:
+        return RtcMessageRow{time, session, *rc::gen::arbitrary<std::uint16_t>(),
+                             *rc::gen::arbitrary<std::uint16_t>(), payload};
+      case 4:
+        return AnalyticsRow{time, {name, "second." + name}, payload};
+      default:
+        return AnalyticsRow{time, name, payload};
+    }
+  }
+
+ private:
+  std::vector<std::shared_ptr<RtcSessionRecord>> sessions_;
+};
+
+RC_GTEST_PROP(StoreBatchProperty, HoldsTheSameRowsAsListsDoAlsoWhenItIsUsedAgain, ()) {
+  RandomRows random;
+  StoreBatch batch;
+  for (int use = 0; use < 3; ++use) {
+    Expected expected;
+    std::size_t bytes = 0;
+    const int count = *rc::gen::inRange(0, 150);
+    for (int n = 0; n < count; ++n) {
+      std::visit(
+          [&](const auto& row) {
+            expected.add(row);
+            ++expected.rows;
+            const StoreRowText text(row);
+            bytes += StoreBatch::bytesOf(row, text);
+            batch.add(row, text);
+          },
+          random.next());
+    }
+    expectEqual(contentsOf(batch), expected);
+    RC_ASSERT(batch.bytes() == bytes);
+    RC_ASSERT(batch.empty() == (count == 0));
+    batch.clear();
+    expectEqual(contentsOf(batch), {});
+    RC_ASSERT(batch.bytes() == 0U);
+  }
+}
+
+TEST(StoreBatchTest, HoldsTextsOfAllSizes) {
+  StoreBatch batch;
+  std::vector<std::string> expected;
+  for (const std::size_t size :
+       std::initializer_list<std::size_t>{0, 1, 16, 1000, 65'535, 65'536, 3'000'000, 2}) {
+    add(batch, AnalyticsRow{0.0, "a", {{"text", std::string(size, 'x')}}});
+    expected.push_back(R"({"text":")" + std::string(size, 'x') + R"("})");
+  }
+  std::vector<std::string> found;
+  for (const StoreBatch::Analytics& row : batch.analytics()) found.emplace_back(batch.text(row.payload));
+  EXPECT_EQ(found, expected);
+}
+
+TEST(StoreBatchTest, CountsARowAtItsTextAndASmallRow) {
+  StoreBatch batch;
+  add(batch, AnalyticsRow{0.0, "a", {{"text", std::string(1000, 'x')}}});
+  EXPECT_EQ(batch.bytes(), sizeof(StoreBatch::Analytics) + 1011U);
+}
+
+TEST(StoreBatchTest, KeepsTheNamesOfRowsThatTakeTurnsOnce) {
+  StoreBatch batch;
+  for (int n = 0; n < 100; ++n) add(batch, AnalyticsRow{0.0, {n % 2 == 0 ? "a" : "b", "c"}, {}});
+  EXPECT_THAT(batch.names(), ElementsAre(EventNames("a", "c"), EventNames("b", "c")));
+}
+
+TEST(StoreBatchTest, KeepsTheSessionsOfMessagesThatTakeTurnsOnceInTheirOrder) {
+  StoreBatch batch;
+  const auto first = std::make_shared<RtcSessionRecord>();
+  const auto second = std::make_shared<RtcSessionRecord>();
+  add(batch, RtcSessionRow{second});
+  for (int n = 0; n < 10; ++n) {
+    add(batch, RtcMessageRow{0.0, first, 1, 1, {}});
+    add(batch, RtcMessageRow{0.0, second, 1, 1, {}});
+  }
+  EXPECT_THAT(batch.sessions(), ElementsAre(second, first));
+  EXPECT_EQ(batch.rows(), 21U);
+}
+
+TEST(StoreBatchTest, ReleasesSessionsWhenItIsCleared) {
+  StoreBatch batch;
+  const auto session = std::make_shared<RtcSessionRecord>();
+  add(batch, RtcMessageRow{0.0, session, 1, 1, {}});
+  EXPECT_EQ(session.use_count(), 2);
+  batch.clear();
+  EXPECT_EQ(session.use_count(), 1);
+}
+
+}  // namespace
+}  // namespace tonewerk
