@@ -31,21 +31,15 @@ void StoreMetricon::sendEvent(const EventNames& names, const UniqueFunction<Valu
 EventNames StoreMetricon::usedOf(const EventNames& names) {
   const MutexLock lock(mutex_);
   readConsumers();
+  const auto known = remembered_.find(names);
+  if (known != remembered_.end()) return known->second;
   EventNames used;
-  if (isUsed(names.first)) used.first = names.first;
-  if (!names.second.empty() && isUsed(names.second)) {
+  if (consumers_->wants(names.first.string())) used.first = names.first;
+  if (!names.second.empty() && consumers_->wants(names.second.string())) {
     (used.first.empty() ? used.first : used.second) = names.second;
   }
-  return used;
-}
-
-bool StoreMetricon::isUsed(const SharedString& name) {
-  const auto known = remembered_.find(name.view());
-  if (known != remembered_.end()) return known->second;
-  std::string text = name.string();
-  const bool used = consumers_->wants(text);
   if (remembered_.size() >= kMaxRemembered) remembered_.clear();
-  remembered_.emplace(std::move(text), used);
+  remembered_.emplace(names, used);
   return used;
 }
 

@@ -3,12 +3,12 @@
 
 #include <chrono>
 #include <optional>
-#include <string>
 #include <string_view>
 #include <unordered_map>
 
 #include "platform/Metricon.h"
 #include "platform/linux/store/AnalyticsConsumers.h"
+#include "platform/linux/store/StoreRow.h"
 #include "values/Mutex.h"
 
 namespace tonewerk {
@@ -44,14 +44,8 @@ class StoreMetricon final : public Metricon {
   // The answers for so many names are remembered. When there are more, all are forgotten.
   static constexpr std::size_t kMaxRemembered = 4096;
 
-  struct NameHash {
-    using is_transparent = void;
-    std::size_t operator()(std::string_view name) const { return SharedString::hashOf(name); }
-  };
-
   // The names that a consumer asks for. `first` is empty when there are none.
   EventNames usedOf(const EventNames& names);
-  bool isUsed(const SharedString& name) REQUIRES(mutex_);
   void readConsumers() REQUIRES(mutex_);
 
   ReportStore& store_;
@@ -64,7 +58,8 @@ class StoreMetricon final : public Metricon {
   std::optional<Value> preference_ GUARDED_BY(mutex_);  // consumers_ was made of this
   std::chrono::nanoseconds readAt_ GUARDED_BY(mutex_){0};
   bool isStale_ GUARDED_BY(mutex_) = true;
-  std::unordered_map<std::string, bool, NameHash, std::equal_to<>> remembered_ GUARDED_BY(mutex_);
+  // Which of an event's names consumers_ ask for.
+  std::unordered_map<EventNames, EventNames, EventNamesHash> remembered_ GUARDED_BY(mutex_);
 };
 
 }  // namespace tonewerk

@@ -152,6 +152,25 @@ TEST_F(StoreMetriconTest, RecordsTwoNamesOfAnEventWithOnePayload) {
   EXPECT_EQ(number("SELECT count(*) FROM analytics_row"), 1);
 }
 
+TEST_F(StoreMetriconTest, SeesAChangeForNamesThatItRemembers) {
+  const EventNames names("com.orvane.x", "org.example.x");
+  const auto send = [&](int n) { metricon_.sendEvent(names, [n] { return ValueMap{{"n", n}}; }); };
+  send(1);
+  configureConsumers(ValueArray{consumer("c", {"org.*"})});
+  send(2);
+  configureConsumers(ValueArray{consumer("c", {"*"})});
+  send(3);
+  configureConsumers(ValueArray{});
+  send(4);
+  EXPECT_EQ(number("SELECT count(*) FROM analytics_event"), 4);
+  EXPECT_EQ(number("SELECT count(*) FROM analytics_event WHERE name = 'com.orvane.x' AND"
+                   " payload ->> 'n' IN (1, 3)"),
+            2);
+  EXPECT_EQ(number("SELECT count(*) FROM analytics_event WHERE name = 'org.example.x' AND"
+                   " payload ->> 'n' IN (2, 3)"),
+            2);
+}
+
 TEST_F(StoreMetriconTest, RecordsOnlyTheNameThatAConsumerAsksFor) {
   metricon_.sendEvent({"org.example.x", "com.orvane.x"}, [] { return ValueMap{{"n", 1}}; });
   metricon_.sendEvent({"com.orvane.y", "org.example.y"}, [] { return ValueMap{{"n", 2}}; });
