@@ -145,6 +145,39 @@ TEST_F(StoreReaderTest, SplitsTheTwoNamesOfARowBetweenTwoReads) {
   EXPECT_THAT(names, ElementsAre("second"));
 }
 
+// docs/store.md recommends this query to programs that follow the events.
+TEST_F(StoreReaderTest, TheEventsAfterAnIdentifierAreFoundByKeyAndNotSorted) {
+  openStore();
+  for (int n = 0; n < 20; ++n) {
+    clock_.advance(1.0);
+    store_->recordEvent(clock_.now(), n % 3 == 0 ? EventNames("x") : EventNames("first", "second"),
+                        {{"n", n}});
+  }
+  ASSERT_TRUE(store_->flush(std::chrono::seconds(30)));
+  SqliteDatabase database;
+  ASSERT_TRUE(database.open(directory_.path("reports.db"), SqliteDatabase::Mode::kReadOnly,
+                            std::chrono::seconds(30)));
+  const auto rows = [&](const std::string& sql, std::int64_t after, int column) {
+    SqliteStatement select = database.prepare(sql);
+    select.bind(1, after);
+    std::vector<std::string> found;
+    while (select.step() == SqliteStatement::Step::kRow) found.push_back(select.text(column));
+    return found;
+  };
+  const std::string query =
+      "SELECT r.id * 2 + n.position AS event, r.recorded_at, n.name, r.payload"
+      " FROM analytics_row AS r CROSS JOIN analytics_name AS n ON n.name_set = r.name_set"
+      " WHERE r.id >= ?1 / 2 AND event > ?1 ORDER BY r.id, n.position LIMIT 10";
+  for (std::int64_t after = 0; after < 45; ++after) {
+    const std::string view = "FROM analytics_event WHERE id > ?1 ORDER BY id LIMIT 10";
+    EXPECT_EQ(rows(query, after, 0), rows("SELECT id " + view, after, 0)) << after;
+    EXPECT_EQ(rows(query, after, 2), rows("SELECT name " + view, after, 0)) << after;
+  }
+  EXPECT_THAT(rows("EXPLAIN QUERY PLAN " + query, 0, 3),
+              ElementsAre(HasSubstr("SEARCH r USING INTEGER PRIMARY KEY (rowid>?)"),
+                          HasSubstr("SEARCH n USING PRIMARY KEY (name_set=?)")));
+}
+
 TEST_F(StoreReaderTest, SumsDurationsOfEveryKind) {
   openStore();
   record("a");
