@@ -5,38 +5,44 @@
 
 namespace tonewerk {
 
-TWReportingSessionMessages TWReportingSessionWorkerUtility::combineRapidMessages(
+std::vector<std::size_t> TWReportingSessionWorkerUtility::mergeRapidMessages(
     const TWReportingSessionMessages& messages, std::span<const std::string_view> keysToCombine,
     double maximumPausetime) {
-  TWReportingSessionMessages result;
+  std::vector<std::size_t> merged;
   std::vector<std::string_view> seen;
   TWReportingSessionMessage* anchor = nullptr;
-  for (const auto& message : messages) {
+  for (std::size_t place = 0; place < messages.size(); ++place) {
+    TWReportingSessionMessage& message = *messages[place];
     const auto key =
         std::find_if(keysToCombine.begin(), keysToCombine.end(),
-                     [&](std::string_view candidate) { return message->message.contains(candidate); });
-    if (key == keysToCombine.end()) {
-      result.push_back(message);
-      continue;
-    }
+                     [&](std::string_view candidate) { return message.message.contains(candidate); });
+    if (key == keysToCombine.end()) continue;
     if (std::find(seen.begin(), seen.end(), *key) != seen.end()) {
       seen.clear();
       anchor = nullptr;
     }
     seen.push_back(*key);
     if (anchor == nullptr) {
-      anchor = message.get();
-      result.push_back(message);
+      anchor = &message;
       continue;
     }
     // Each merge updates the anchor's time. A pause that is not a number does not count as short.
-    if (message->epochTime() - anchor->epochTime() < maximumPausetime) {
-      anchor->message.merge(message->message);
-    } else {
-      result.push_back(message);
+    if (message.epochTime() - anchor->epochTime() < maximumPausetime) {
+      anchor->message.merge(message.message);
+      merged.push_back(place);
     }
   }
-  return result;
+  return merged;
+}
+
+TWReportingSessionMessages TWReportingSessionWorkerUtility::combineRapidMessages(
+    const TWReportingSessionMessages& messages, std::span<const std::string_view> keysToCombine,
+    double maximumPausetime) {
+  TWReportingSessionMessages remaining = messages;
+  const std::vector<std::size_t> merged = mergeRapidMessages(messages, keysToCombine, maximumPausetime);
+  std::for_each(merged.begin(), merged.end(), [&](std::size_t place) { remaining[place] = nullptr; });
+  std::erase(remaining, nullptr);
+  return remaining;
 }
 
 bool TWReportingSessionWorkerUtility::isVidroXYerrorMessage(const TWReportingSessionMessage& message) {

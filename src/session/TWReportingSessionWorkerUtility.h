@@ -1,8 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <cstddef>
 #include <span>
 #include <string_view>
+#include <vector>
 
 #include "session/TWReportingSessionMessage.h"
 
@@ -11,10 +13,15 @@ namespace tonewerk {
 // Functions that several workers use.
 class TWReportingSessionWorkerUtility {
  public:
-  // Merges each burst of messages that have one of `keysToCombine` into the burst's first message, and
-  // returns the remaining records in order. The first message's payload is changed in place. A burst ends
+  // Merges each burst of messages that have one of `keysToCombine` into the burst's first message, whose
+  // payload is changed in place. Returns the places of the messages that were merged, in order. A burst ends
   // when one of its keys comes again. A message that comes `maximumPausetime` seconds or more after the
   // last merged one is not merged, but does not end the burst.
+  static std::vector<std::size_t> mergeRapidMessages(const TWReportingSessionMessages& messages,
+                                                     std::span<const std::string_view> keysToCombine,
+                                                     double maximumPausetime);
+
+  // Does the same, and returns the remaining records in order.
   static TWReportingSessionMessages combineRapidMessages(const TWReportingSessionMessages& messages,
                                                          std::span<const std::string_view> keysToCombine,
                                                          double maximumPausetime);

@@ -27,61 +27,121 @@ Value IntervalWalk::Interval::bucketedLength() const {
       .value_or("");
 }
 
-IntervalWalk::IntervalWalk(const Kind& kind, const LogSite& site, double minimumSeconds, ValueMap defaults,
-                           const ValueMap& previousValues)
-    : kind_(kind), site_(site), minimumSeconds_(minimumSeconds), state_(std::move(defaults)) {
-  state_.merge(previousValues);
-  if (!state_.boolean(kind_.runningKey)) return;
+IntervalWalk::Latest::Latest(const IntervalWalk& walk, std::string_view key, std::optional<Value> initial)
+    : walk_(walk), key_(key), initial_(std::move(initial)), value_(walk.previousValues_.find(key)) {
+  if (value_ == nullptr && initial_) value_ = &*initial_;
+}
+
+const Value* IntervalWalk::Latest::find() {
+  const std::size_t current = walk_.walked_.size() - 1;
+  for (std::size_t place = current; place > searched_; --place) {
+    const Value* found = in(place - 1);
+    if (found == nullptr) continue;
+    value_ = found;
+    break;
+  }
+  searched_ = current;
+  return value_;
+}
+
+const Value* IntervalWalk::Latest::now() { return in(walk_.walked_.size() - 1); }
+
+// Remembers the message, because the walk mostly asks for the same one again at its next step.
+const Value* IntervalWalk::Latest::in(std::size_t place) {
+  if (lookedUp_ != place + 1) {
+    lookedUp_ = place + 1;
+    found_ = walk_.walked_[place]->find(key_);
+  }
+  return found_;
+}
+
+// These search for the earlier value first: it is in the message that in() remembers.
+bool IntervalWalk::Latest::changesText() {
+  const Value* before = find();
+  const Value* after = now();
+  if (before == nullptr || after == nullptr) return false;
+  const SharedString* textBefore = before->asString();
+  const SharedString* textAfter = after->asString();
+  if (textBefore != nullptr && textAfter != nullptr) return !(*textBefore == *textAfter);
+  return before->text() != after->text();
+}
+
+bool IntervalWalk::Latest::changesNumber() {
+  const Value* before = find();
+  const Value* after = now();
+  return before != nullptr && after != nullptr && before->number() != after->number();
+}
+
+bool IntervalWalk::Latest::changes() {
+  const Value* before = find();
+  const Value* after = now();
+  return before != nullptr && after != nullptr && !(*before == *after);
+}
+
+IntervalWalk::IntervalWalk(const Kind& kind, const LogSite& site, double minimumSeconds,
+                           ValueMap previousValues)
+    : kind_(kind),
+      site_(site),
+      minimumSeconds_(minimumSeconds),
+      previousValues_(std::move(previousValues)),
+      wasRunning_(previousValues_.boolean(kind.runningKey)) {
+  if (!wasRunning_) return;
   switch (kind_.openInterval) {
     case OpenInterval::kContinues:
       isRunning_ = true;
-      begin_ = timestampOf(state_);
+      begin_ = timestampOf(previousValues_);
       break;
     case OpenInterval::kIgnored:
-      // Without the key, the first message finds nothing running.
-      state_.erase(kind_.runningKey);
+      // The first message finds nothing running.
+      wasRunning_ = false;
       break;
     case OpenInterval::kNoBegin:
       break;
   }
 }
 
-TWReportingSessionMessages IntervalWalk::summariesOf(const TWReportingSessionMessages& messages) {
-  for (const auto& message : messages) step(message->message);
+TWReportingSessionMessages IntervalWalk::summariesOf(const TWReportingSessionMessages& messages,
+                                                     std::span<const std::size_t> leftOut) {
+  walked_.reserve(messages.size() - leftOut.size());
+  auto nextLeftOut = leftOut.begin();
+  for (std::size_t place = 0; place < messages.size(); ++place) {
+    if (nextLeftOut != leftOut.end() && *nextLeftOut == place) {
+      ++nextLeftOut;
+      continue;
+    }
+    walked_.push_back(&messages[place]->message);
+    step();
+  }
   for (const auto& summary : summaries_) {
     summary->message.set(TWReportingMessageKeyMessageCount, summaries_.size());
   }
   return std::move(summaries_);
 }
 
-bool IntervalWalk::changesText(const ValueMap& message, std::string_view key) const {
-  const Value* before = state_.find(key);
-  const Value* now = message.find(key);
-  return before != nullptr && now != nullptr && before->text() != now->text();
-}
-
-void IntervalWalk::step(const ValueMap& message) {
-  const std::optional<Value> timestamp = timestampOf(message);
-  const bool wasRunning = state_.boolean(kind_.runningKey);
-  const bool isLast = message.contains(TWReportingMessageKeySessionDuration);
+void IntervalWalk::step() {
+  running_ = message().find(kind_.runningKey);
+  if (!wasRunning_ && running_ == nullptr) return;
+  const bool saysOn = running_ != nullptr && running_->boolean();
+  const bool isLast = message().contains(TWReportingMessageKeySessionDuration);
   bool ends = isLast;
-  if (const Value* running = message.find(kind_.runningKey)) {
-    isRunning_ = running->boolean();
-    if (!wasRunning && isRunning_ && begins(message)) begin_ = timestamp;
+  if (running_ != nullptr) {
+    isRunning_ = saysOn;
+    if (!wasRunning_ && isRunning_ && begins()) begin_ = timestampOf(message());
     if (!isRunning_) ends = true;
   } else if (isLast) {
     isRunning_ = false;
   }
   if (isRunning_) {
-    if (endsInterval(message)) ends = true;
-    collect(message);
+    if (endsInterval()) ends = true;
+    collect();
   }
-  if (wasRunning && ends) {
+  if (wasRunning_ && ends) {
+    const std::optional<Value> timestamp = timestampOf(message());
     endInterval(timestamp);
     begin_ = timestamp;  // of the next interval, when output or input keeps running
   }
   if (!isRunning_) begin_.reset();
-  state_.merge(message);
+  if (running_ != nullptr) wasRunning_ = saysOn;
 }
 
 void IntervalWalk::endInterval(const std::optional<Value>& end) {

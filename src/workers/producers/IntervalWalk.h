@@ -1,9 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <optional>
+#include <span>
 #include <string_view>
+#include <vector>
 
 #include "platform/Log.h"
 #include "session/TWReportingSessionMessage.h"
@@ -18,9 +21,13 @@ namespace tonewerk {
 //   conditions   A ............ B ..............
 //   intervals    |----- A -----||----- B ------|
 //
-// The walk keeps the latest value of every key, finds where intervals begin and end, leaves out those that
-// are too short, numbers and counts the summaries, and logs what it does. A producer derives from it and says
-// which changes end an interval and what a summary holds. An object walks once, on the work queue.
+// The walk finds where intervals begin and end, leaves out those that are too short, numbers and counts the
+// summaries, and logs what it does. A producer derives from it and says which changes end an interval and what
+// a summary holds. An object walks once, on the work queue.
+//
+// Sessions store many messages, and few of them end an interval. So the walk does not collect what every
+// message says. It reads a few keys of each message, and searches the earlier messages for the other values
+// that it needs (see Latest).
 class IntervalWalk {
  public:
   // What happens to an interval that the previous values show as running.
@@ -51,37 +58,70 @@ class IntervalWalk {
   };
 
   // `site` is the producer's source file and line, which the log lines carry. Intervals of `minimumSeconds`
-  // or less are too short. The walk's state begins with `defaults` and then the session's previous values.
-  // The texts of `kind` outlive the walk.
-  IntervalWalk(const Kind& kind, const LogSite& site, double minimumSeconds, ValueMap defaults,
-               const ValueMap& previousValues);
+  // or less are too short. The walk begins with what the session's previous values say. The texts of `kind`
+  // outlive the walk.
+  IntervalWalk(const Kind& kind, const LogSite& site, double minimumSeconds, ValueMap previousValues);
   IntervalWalk(const IntervalWalk&) = delete;
   IntervalWalk& operator=(const IntervalWalk&) = delete;
   virtual ~IntervalWalk() = default;
 
-  // The summaries of `messages`, in order. Each says how many there are.
-  TWReportingSessionMessages summariesOf(const TWReportingSessionMessages& messages);
+  // The summaries of `messages` without those at the places `leftOut`, which ascend. In order; each says how
+  // many there are. Nobody may change the messages meanwhile.
+  TWReportingSessionMessages summariesOf(const TWReportingSessionMessages& messages,
+                                         std::span<const std::size_t> leftOut = {});
 
  protected:
-  // The latest value of every key, before the message that is being looked at.
-  const ValueMap& state() const { return state_; }
-  // The latest value of one key, which the state must have.
-  Value current(std::string_view key) const { return *state_.find(key); }
-  // Whether the state and the message both have the key, with different texts.
-  bool changesText(const ValueMap& message, std::string_view key) const;
+  // The latest value of one key before the message that is being looked at. It is searched only when it is
+  // asked for, from there backwards to the last search. So each message is searched at most once, and mostly
+  // only the one before.
+  class Latest {
+   public:
+    // `initial` is the value when neither the messages nor the previous values have the key.
+    Latest(const IntervalWalk& walk, std::string_view key, std::optional<Value> initial = std::nullopt);
+    Latest(const Latest&) = delete;
+    Latest& operator=(const Latest&) = delete;
+
+    // Null when there is none. Valid as long as the walk.
+    const Value* find();
+    // Only when there is one.
+    const Value& value() { return *find(); }
+    // What the message that is being looked at says; null when it does not have the key.
+    const Value* now();
+
+    // Whether there are both values, and they differ: in their texts, as numbers, or as values.
+    bool changesText();
+    bool changesNumber();
+    bool changes();
+
+   private:
+    const Value* in(std::size_t place);
+
+    const IntervalWalk& walk_;
+    const std::string_view key_;
+    const std::optional<Value> initial_;
+    const Value* value_ = nullptr;  // the latest one in the first searched_ messages
+    std::size_t searched_ = 0;
+    std::size_t lookedUp_ = 0;  // place + 1 of the message that `found_` is from; 0 for none
+    const Value* found_ = nullptr;
+  };
+
+  // The message that is being looked at.
+  const ValueMap& message() const { return *walked_.back(); }
+  // Whether it says that output or input runs, or that it does not.
+  bool saysRunning() const { return running_ != nullptr; }
 
  private:
   // Whether a message that starts output or input begins an interval.
-  virtual bool begins(const ValueMap& /*message*/) const { return true; }
+  virtual bool begins() { return true; }
   // Whether a message ends the interval although output or input still runs.
-  virtual bool endsInterval(const ValueMap& message) const = 0;
+  virtual bool endsInterval() = 0;
   // Called for each message while output or input runs, before the message ends an interval.
-  virtual void collect(const ValueMap& /*message*/) {}
-  // The summary of an interval that is long enough. state() is still what it was before the message that ends
-  // it. None when the interval yields no summary.
+  virtual void collect() {}
+  // The summary of an interval that is long enough. The message that ends the interval is being looked at.
+  // None when the interval yields no summary.
   virtual std::optional<ValueMap> summaryOf(const Interval& interval) = 0;
 
-  void step(const ValueMap& message);
+  void step();
   void endInterval(const std::optional<Value>& end);
   std::optional<double> measure(const std::optional<Value>& end) const;
   std::optional<ValueMap> summaryUntil(const std::optional<Value>& end);
@@ -89,7 +129,10 @@ class IntervalWalk {
   const Kind kind_;
   const LogSite site_;
   const double minimumSeconds_;
-  ValueMap state_;
+  const ValueMap previousValues_;
+  std::vector<const ValueMap*> walked_;  // up to the message that is being looked at
+  const Value* running_ = nullptr;       // what this message says
+  bool wasRunning_ = false;              // what the latest message before it says that says something
   bool isRunning_ = false;
   std::optional<Value> begin_;  // the time at which the current interval began
   TWReportingSessionMessages summaries_;

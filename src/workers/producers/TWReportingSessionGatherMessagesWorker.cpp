@@ -3,7 +3,7 @@
 
 #include <cassert>
 #include <optional>
-#include <string_view>
+#include <utility>
 
 #include "platform/Log.h"
 #include "session/TWReportingKeys.h"
@@ -23,48 +23,41 @@ constexpr IntervalWalk::Kind kKind{.runningKey = TWReportingMessageKeySessionOut
                                    .subject = "gather",
                                    .length = "playingTime"};
 
-ValueMap defaultState() {
-  return {{TWReportingMessageKeySelectedFormat, "unknown"},
-          {TWReportingMessageKeyActiveDevices, "unknown"},
-          {TWReportingMessageKeyFormatID, "unknown"},
-          {TWReportingMessageKeyChannelsPerFrame, -1}};
-}
-
-bool isInGather(const ValueMap& map) { return map.integer(TWReportingMessageKeyGatherSession) == 1; }
-
 class GatherWalk final : public IntervalWalk {
  public:
-  GatherWalk(const LogSite& site, const ValueMap& previousValues, double minimumPlaytime)
-      : IntervalWalk(kKind, site, minimumPlaytime, defaultState(), previousValues) {}
+  GatherWalk(const LogSite& site, ValueMap previousValues, double minimumPlaytime)
+      : IntervalWalk(kKind, site, minimumPlaytime, std::move(previousValues)) {}
 
  private:
-  bool begins(const ValueMap& message) const override { return isInGather(message); }
+  static bool isInGather(const Value* gather) { return integerOf(gather) == 1; }
 
-  bool endsInterval(const ValueMap& message) const override {
+  bool begins() override { return isInGather(gather_.now()); }
+
+  bool endsInterval() override {
     // A further start of output that is not in a Gather session ends an interval that is in one.
-    if (message.contains(TWReportingMessageKeySessionOutputRunning) && isInGather(state()) &&
-        !isInGather(message)) {
-      return true;
-    }
-    if (changesText(message, TWReportingMessageKeySelectedFormat) ||
-        changesText(message, TWReportingMessageKeyActiveDevices)) {
-      return true;
-    }
+    if (saysRunning() && isInGather(gather_.find()) && !isInGather(gather_.now())) return true;
+    if (selectedFormat_.changesText() || activeDevices_.changesText()) return true;
     // A 0 without a start of output ends no interval in a Gather session. It ends one that is in none.
-    const Value* gather = message.find(TWReportingMessageKeyGatherSession);
-    return gather != nullptr && gather->integer() == 0 && !isInGather(state());
+    const Value* gather = gather_.now();
+    return gather != nullptr && gather->integer() == 0 && !isInGather(gather_.find());
   }
 
   std::optional<ValueMap> summaryOf(const Interval& interval) override {
-    if (!state().contains(TWReportingMessageKeyGatherSession)) return std::nullopt;
-    return ValueMap{{TWReportingMessageKeySelectedFormat, current(TWReportingMessageKeySelectedFormat)},
-                    {TWReportingMessageKeyFormatID, current(TWReportingMessageKeyFormatID)},
-                    {TWReportingMessageKeyActiveDevices, current(TWReportingMessageKeyActiveDevices)},
+    if (gather_.find() == nullptr) return std::nullopt;
+    return ValueMap{{TWReportingMessageKeySelectedFormat, selectedFormat_.value()},
+                    {TWReportingMessageKeyFormatID, formatID_.value()},
+                    {TWReportingMessageKeyActiveDevices, activeDevices_.value()},
                     {TWReportingMessageKeyPlayseconds, interval.length()},
-                    {TWReportingMessageKeyChannelsPerFrame, current(TWReportingMessageKeyChannelsPerFrame)},
+                    {TWReportingMessageKeyChannelsPerFrame, channels_.value()},
                     {TWReportingMessageKeyPlaysecondsBucketed, interval.bucketedLength()},
                     {TWReportingMessageKeyMessageIndex, interval.index}};
   }
+
+  Latest gather_{*this, TWReportingMessageKeyGatherSession};
+  Latest selectedFormat_{*this, TWReportingMessageKeySelectedFormat, "unknown"};
+  Latest activeDevices_{*this, TWReportingMessageKeyActiveDevices, "unknown"};
+  Latest formatID_{*this, TWReportingMessageKeyFormatID, "unknown"};
+  Latest channels_{*this, TWReportingMessageKeyChannelsPerFrame, -1};
 };
 
 }  // namespace

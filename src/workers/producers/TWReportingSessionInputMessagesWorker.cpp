@@ -3,10 +3,13 @@
 
 #include <array>
 #include <cassert>
+#include <cstddef>
 #include <optional>
 #include <set>
 #include <string>
 #include <string_view>
+#include <utility>
+#include <vector>
 
 #include "platform/Log.h"
 #include "session/TWReportingKeys.h"
@@ -21,8 +24,8 @@ namespace {
 constexpr std::array<std::string_view, 2> kKeysToCombine{TWReportingMessageKeySpatialAudioAccessoryFeature,
                                                          TWReportingMessageKeySpatializationEnabled};
 constexpr double kMaxPauseSeconds = 2.0;  // intentionally less than for volume summaries
-// When the previous values show input running, that interval has no begin. The state keeps what they say, so
-// the first message finds input running.
+// When the previous values show input running, that interval has no begin, but the first message finds input
+// running.
 constexpr IntervalWalk::Kind kKind{.runningKey = TWReportingMessageKeySessionInputRunning,
                                    .openInterval = IntervalWalk::OpenInterval::kNoBegin,
                                    .category = kCategoryInput,
@@ -32,16 +35,6 @@ constexpr IntervalWalk::Kind kKind{.runningKey = TWReportingMessageKeySessionInp
 
 // A sample rate that begins so is below 1: no vocoder runs.
 constexpr std::string_view kNoRate = "0.";
-
-ValueMap defaultState() {
-  return {{TWReportingMessageKeySelectedFormat, "unknown"},
-          {TWReportingMessageKeyActiveDevices, "unknown"},
-          {TWReportingMessageKeyFormatID, "unknown"},
-          {TWReportingMessageKeyVpConfigOperationMode, "unknown"},
-          {TWReportingMessageKeyVpConfigInputPort, "unknown"},
-          {TWReportingMessageKeyVpConfigPrimaryVocoderFs, "unknown"},
-          {TWReportingMessageKeyVpConfigPrimaryVocoder, "unknown"}};
-}
 
 std::string joined(const std::set<std::string>& names) {
   std::string text;
@@ -54,43 +47,40 @@ std::string joined(const std::set<std::string>& names) {
 
 class InputWalk final : public IntervalWalk {
  public:
-  InputWalk(const LogSite& site, const ValueMap& previousValues, const SharedString* process,
+  InputWalk(const LogSite& site, ValueMap previousValues, const SharedString* process,
             double minimumRunningtime)
-      : IntervalWalk(kKind, site, minimumRunningtime, defaultState(), previousValues), process_(process) {}
+      : IntervalWalk(kKind, site, minimumRunningtime, std::move(previousValues)), process_(process) {}
 
  private:
-  bool endsInterval(const ValueMap& message) const override {
-    return changes(message, TWReportingMessageKeyActiveDevices);
-  }
+  bool endsInterval() override { return activeDevices_.changes(); }
 
-  void collect(const ValueMap& message) override {
-    if (!changes(message, TWReportingMessageKeyVpConfigPrimaryVocoder)) return;
-    const std::string rate = textOf(message.find(TWReportingMessageKeyVpConfigPrimaryVocoderFs));
+  void collect() override {
+    if (!vocoder_.changes()) return;
+    const std::string rate = textOf(message().find(TWReportingMessageKeyVpConfigPrimaryVocoderFs));
     if (rate.starts_with(kNoRate)) return;
-    vocoders_.insert(message.text(TWReportingMessageKeyVpConfigPrimaryVocoder) + ":" + rate);
+    vocoders_.insert(vocoder_.now()->text() + ":" + rate);
   }
 
   std::optional<ValueMap> summaryOf(const Interval& interval) override {
     if (process_ == nullptr) return std::nullopt;
-    ValueMap summary{
-        {TWReportingApplicationName, *process_},
-        {TWReportingMessageKeyInputrunningSeconds, interval.length()},
-        {TWReportingMessageKeyInputrunningSecondsBucketed, interval.bucketedLength()},
-        {TWReportingMessageKeyMessageIndex, interval.index},
-        {TWReportingMessageKeyVpConfigOperationMode, current(TWReportingMessageKeyVpConfigOperationMode)},
-        {TWReportingMessageKeyVpConfigInputPort, current(TWReportingMessageKeyVpConfigInputPort)},
-        {TWReportingMessageKeyActiveDevices, current(TWReportingMessageKeyActiveDevices)}};
+    ValueMap summary{{TWReportingApplicationName, *process_},
+                     {TWReportingMessageKeyInputrunningSeconds, interval.length()},
+                     {TWReportingMessageKeyInputrunningSecondsBucketed, interval.bucketedLength()},
+                     {TWReportingMessageKeyMessageIndex, interval.index},
+                     {TWReportingMessageKeyVpConfigOperationMode, operationMode_.value()},
+                     {TWReportingMessageKeyVpConfigInputPort, inputPort_.value()},
+                     {TWReportingMessageKeyActiveDevices, activeDevices_.value()}};
     if (!vocoders_.empty()) summary.set(TWReportingMessageKeyVocoders, joined(vocoders_));
     vocoders_.clear();
     return summary;
   }
 
-  bool changes(const ValueMap& message, std::string_view key) const {
-    return TWReportingUtilityKeyIsPresentAndHasChanged(key, &message, &state());
-  }
-
   const SharedString* process_;     // null gives no summaries
   std::set<std::string> vocoders_;  // the new vocoders since the last summary, each as "name:rate"
+  Latest activeDevices_{*this, TWReportingMessageKeyActiveDevices, "unknown"};
+  Latest vocoder_{*this, TWReportingMessageKeyVpConfigPrimaryVocoder, "unknown"};
+  Latest operationMode_{*this, TWReportingMessageKeyVpConfigOperationMode, "unknown"};
+  Latest inputPort_{*this, TWReportingMessageKeyVpConfigInputPort, "unknown"};
 };
 
 }  // namespace
@@ -118,8 +108,9 @@ TWReportingSessionMessages TWReportingSessionInputMessagesWorker::createInputMes
   const auto owner = session.lock();
   InputWalk walk(TWReportingSessionCategory(), owner == nullptr ? ValueMap() : owner->previousValues(),
                  process, minimumRunningtime);
-  TWReportingSessionMessages summaries = walk.summariesOf(
-      TWReportingSessionWorkerUtility::combineRapidMessages(messages, kKeysToCombine, kMaxPauseSeconds));
+  const std::vector<std::size_t> merged =
+      TWReportingSessionWorkerUtility::mergeRapidMessages(messages, kKeysToCombine, kMaxPauseSeconds);
+  TWReportingSessionMessages summaries = walk.summariesOf(messages, merged);
   debugLog(TWReportingSessionCategory(), "returning input messages { func=%s, action=return, count=%lu }",
            "createInputMessages", summaries.size());
   return summaries;

@@ -3,8 +3,11 @@
 
 #include <array>
 #include <cassert>
+#include <cstddef>
 #include <optional>
 #include <string_view>
+#include <utility>
+#include <vector>
 
 #include "platform/Log.h"
 #include "session/TWReportingKeys.h"
@@ -26,61 +29,48 @@ constexpr IntervalWalk::Kind kKind{.runningKey = TWReportingMessageKeySessionOut
                                    .subject = "volume",
                                    .length = "playingTime"};
 
-ValueMap defaultState() {
-  return {{TWReportingMessageKeySelectedFormat, "unknown"},
-          {TWReportingMessageKeyActiveDevices, "unknown"},
-          {TWReportingMessageKeyFormatID, "unknown"},
-          {TWReportingMessageKeySpatialAudioAccessoryFeature, false},
-          {TWReportingMessageKeySpatializationEnabled, false},
-          {TWReportingMessageKeyRingerState, false},
-          {TWReportingMessageKeyChannelsPerFrame, -1}};
-}
-
 class VolumeWalk final : public IntervalWalk {
  public:
-  VolumeWalk(const LogSite& site, const ValueMap& previousValues, const SharedString* process,
+  VolumeWalk(const LogSite& site, ValueMap previousValues, const SharedString* process,
              double minimumPlaytime)
-      : IntervalWalk(kKind, site, minimumPlaytime, defaultState(), previousValues), process_(process) {}
+      : IntervalWalk(kKind, site, minimumPlaytime, std::move(previousValues)), process_(process) {}
 
  private:
-  bool endsInterval(const ValueMap& message) const override {
-    return changesText(message, TWReportingMessageKeySelectedFormat) ||
-           changesText(message, TWReportingMessageKeyActiveDevices) ||
-           changesNumber(message, TWReportingMessageKeySpatializationEnabled) ||
-           changesNumber(message, TWReportingMessageKeyRingerState) ||
-           changesNumber(message, TWReportingMessageKeyVolume);
+  bool endsInterval() override {
+    return selectedFormat_.changesText() || activeDevices_.changesText() || spatialization_.changesNumber() ||
+           ringerState_.changesNumber() || volume_.changesNumber();
   }
 
   std::optional<ValueMap> summaryOf(const Interval& interval) override {
-    if (process_ == nullptr || !state().contains(TWReportingMessageKeyVolume)) return std::nullopt;
-    const Value volume = current(TWReportingMessageKeyVolume);
-    return ValueMap{
-        {TWReportingMessageKeySelectedFormat, current(TWReportingMessageKeySelectedFormat)},
-        {TWReportingMessageKeyFormatID, current(TWReportingMessageKeyFormatID)},
-        {TWReportingMessageKeyActiveDevices, current(TWReportingMessageKeyActiveDevices)},
-        {TWReportingApplicationName, *process_},
-        {TWReportingMessageKeyVolume, volume},
-        {TWReportingMessageKeyVolumeBucketed,
-         TWReportingUtilityBucketNumberToString(volume.number(),
-                                                TWReportingUtilityBucketNumberToStringVolumes, 4)
-             .value_or("")},
-        {TWReportingMessageKeyPlayseconds, interval.length()},
-        {TWReportingMessageKeySpatialAudioAccessoryFeature,
-         current(TWReportingMessageKeySpatialAudioAccessoryFeature)},
-        {TWReportingMessageKeySpatializationEnabled, current(TWReportingMessageKeySpatializationEnabled)},
-        {TWReportingMessageKeyRingerState, current(TWReportingMessageKeyRingerState)},
-        {TWReportingMessageKeyChannelsPerFrame, current(TWReportingMessageKeyChannelsPerFrame)},
-        {TWReportingMessageKeyPlaysecondsBucketed, interval.bucketedLength()},
-        {TWReportingMessageKeyMessageIndex, interval.index}};
-  }
-
-  bool changesNumber(const ValueMap& message, std::string_view key) const {
-    const Value* before = state().find(key);
-    const Value* now = message.find(key);
-    return before != nullptr && now != nullptr && before->number() != now->number();
+    const Value* volume = volume_.find();
+    if (process_ == nullptr || volume == nullptr) return std::nullopt;
+    return ValueMap{{TWReportingMessageKeySelectedFormat, selectedFormat_.value()},
+                    {TWReportingMessageKeyFormatID, formatID_.value()},
+                    {TWReportingMessageKeyActiveDevices, activeDevices_.value()},
+                    {TWReportingApplicationName, *process_},
+                    {TWReportingMessageKeyVolume, *volume},
+                    {TWReportingMessageKeyVolumeBucketed,
+                     TWReportingUtilityBucketNumberToString(volume->number(),
+                                                            TWReportingUtilityBucketNumberToStringVolumes, 4)
+                         .value_or("")},
+                    {TWReportingMessageKeyPlayseconds, interval.length()},
+                    {TWReportingMessageKeySpatialAudioAccessoryFeature, accessoryFeature_.value()},
+                    {TWReportingMessageKeySpatializationEnabled, spatialization_.value()},
+                    {TWReportingMessageKeyRingerState, ringerState_.value()},
+                    {TWReportingMessageKeyChannelsPerFrame, channels_.value()},
+                    {TWReportingMessageKeyPlaysecondsBucketed, interval.bucketedLength()},
+                    {TWReportingMessageKeyMessageIndex, interval.index}};
   }
 
   const SharedString* process_;  // null gives no summaries
+  Latest selectedFormat_{*this, TWReportingMessageKeySelectedFormat, "unknown"};
+  Latest activeDevices_{*this, TWReportingMessageKeyActiveDevices, "unknown"};
+  Latest spatialization_{*this, TWReportingMessageKeySpatializationEnabled, false};
+  Latest ringerState_{*this, TWReportingMessageKeyRingerState, false};
+  Latest volume_{*this, TWReportingMessageKeyVolume};
+  Latest formatID_{*this, TWReportingMessageKeyFormatID, "unknown"};
+  Latest accessoryFeature_{*this, TWReportingMessageKeySpatialAudioAccessoryFeature, false};
+  Latest channels_{*this, TWReportingMessageKeyChannelsPerFrame, -1};
 };
 
 }  // namespace
@@ -106,8 +96,9 @@ TWReportingSessionMessages TWReportingSessionVolumeMessagesWorker::createVolumeM
   const auto owner = session.lock();
   VolumeWalk walk(TWReportingSessionCategory(), owner == nullptr ? ValueMap() : owner->previousValues(),
                   process, minimumPlaytime);
-  return walk.summariesOf(
-      TWReportingSessionWorkerUtility::combineRapidMessages(messages, kKeysToCombine, kMaxPauseSeconds));
+  const std::vector<std::size_t> merged =
+      TWReportingSessionWorkerUtility::mergeRapidMessages(messages, kKeysToCombine, kMaxPauseSeconds);
+  return walk.summariesOf(messages, merged);
 }
 
 }  // namespace tonewerk

@@ -15,6 +15,7 @@
 
 #include "session/TWReportingSessionWorkerUtility.h"
 #include "support/ReportingTest.h"
+#include "workers/producers/PlainWalk.h"
 
 namespace tonewerk {
 
@@ -156,6 +157,40 @@ class ProducerTest : public ReportingTest {
       RC_ASSERT(summary->message.integer("msgcnt") == static_cast<std::int64_t>(summaries.size()));
       check(*summary);
     }
+  }
+
+  // A property: with any stream and any previous values, the producer's summaries are those of `plain`, to the
+  // order of their keys and the kinds of their values. The stream's rapid spatial messages are merged first if
+  // they are at most `maxPauseSeconds` apart; 0 for not at all.
+  void checkAgainst(PlainWalk plain, std::vector<std::string> keys, double maxPauseSeconds) {
+    const auto messages = anyStream(keys);
+    ValueMap previous;
+    for (const auto& record : anyStream(keys)) {
+      previous.merge(record->message);
+      if (previous.size() > 3) break;
+    }
+    const auto owner = makeSession();
+    owner->addPreviousValues(previous);
+    const auto merged =
+        maxPauseSeconds > 0 ? PlainWalk::combined(messages, maxPauseSeconds) : copiesOf(messages);
+    const std::vector<ValueMap> expected = plain.summariesOf(merged, previous);
+    session = owner;
+
+    const auto summaries = summariesOf(messages);
+    RC_CLASSIFY(expected.size() > 1);
+    RC_ASSERT(exactTextsOf(payloadsOf(summaries)) == exactTextsOf(expected));
+  }
+
+  // Also shows what the compact JSON does not: the kinds of numbers, and numbers that JSON cannot express.
+  static std::vector<std::string> exactTextsOf(const std::vector<ValueMap>& maps) {
+    std::vector<std::string> texts;
+    for (const ValueMap& map : maps) {
+      std::string& text = texts.emplace_back(map.text());
+      for (const ValueMap::Entry& entry : map) {
+        text += ' ' + std::to_string(static_cast<int>(entry.value.kind())) + ' ' + entry.value.text();
+      }
+    }
+    return texts;
   }
 
   // Merges rapid spatial messages as the producers of volume and input summaries do.

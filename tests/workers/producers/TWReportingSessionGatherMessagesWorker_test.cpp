@@ -278,5 +278,40 @@ RC_GTEST_FIXTURE_PROP(GatherMessagesTest, SurvivesAnyStream, ()) {
       });
 }
 
+PlainWalk plainWalk() {
+  const auto isInGather = [](const ValueMap& map) { return map.integer(kGather) == 1; };
+  return {.runningKey = kRunning,
+          .open = PlainWalk::Open::kContinues,
+          .state = {{kFormat, "unknown"},
+                    {kDevices, "unknown"},
+                    {"mFormatID", "unknown"},
+                    {"mChannelsPerFrame", -1}},
+          .endsInterval =
+              [isInGather](const ValueMap& state, const ValueMap& message) {
+                const bool leaves = message.contains(kRunning) && isInGather(state) && !isInGather(message);
+                const bool says0 = message.contains(kGather) && message.integer(kGather) == 0;
+                return leaves || PlainWalk::changesText(state, message, kFormat) ||
+                       PlainWalk::changesText(state, message, kDevices) || (says0 && !isInGather(state));
+              },
+          .summaryOf = [](const ValueMap& state, double seconds, int index) -> std::optional<ValueMap> {
+            if (!state.contains(kGather)) return std::nullopt;
+            return ValueMap{{kFormat, *state.find(kFormat)},
+                            {"mFormatID", *state.find("mFormatID")},
+                            {kDevices, *state.find(kDevices)},
+                            {"play_seconds", PlainWalk::singlePrecision(seconds)},
+                            {"mChannelsPerFrame", *state.find("mChannelsPerFrame")},
+                            {"play_secondsBucketed", PlainWalk::bucketed(seconds)},
+                            {"msgidx", index}};
+          },
+          .begins = isInGather};
+}
+
+RC_GTEST_FIXTURE_PROP(GatherMessagesTest, SummarisesLikeAWalkThatMergesEveryMessage, ()) {
+  checkAgainst(plainWalk(),
+               {kRunning, kRunning, kGather, kGather, kDevices, kFormat, "session_duration", "mFormatID",
+                "mChannelsPerFrame", "spatializationEnabled", "other"},
+               0.0);
+}
+
 }  // namespace
 }  // namespace tonewerk

@@ -325,5 +325,51 @@ RC_GTEST_FIXTURE_PROP(InputMessagesTest, SurvivesAnyStream, ()) {
       });
 }
 
+PlainWalk plainWalk(std::set<std::string>& vocoders) {
+  return {
+      .runningKey = kRunning,
+      .open = PlainWalk::Open::kNoBegin,
+      .state = {{"active_devices", "unknown"},
+                {"vp_config_operation_mode", "unknown"},
+                {"vp_config_input_port", "unknown"},
+                {kRate, "unknown"},
+                {kVocoder, "unknown"}},
+      .endsInterval =
+          [](const ValueMap& state, const ValueMap& message) {
+            return TWReportingUtilityKeyIsPresentAndHasChanged("active_devices", &message, &state);
+          },
+      .summaryOf = [&vocoders](const ValueMap& state, double seconds, int index) -> std::optional<ValueMap> {
+        ValueMap summary{{"HostApplicationDisplayID", "com.orvane.recorder"},
+                         {"inputrunning_seconds", PlainWalk::singlePrecision(seconds)},
+                         {"inputrunning_secondsBucketed", PlainWalk::bucketed(seconds)},
+                         {"msgidx", index},
+                         {"vp_config_operation_mode", *state.find("vp_config_operation_mode")},
+                         {"vp_config_input_port", *state.find("vp_config_input_port")},
+                         {"active_devices", *state.find("active_devices")}};
+        std::string names;
+        for (const std::string& name : vocoders) names += (names.empty() ? "" : ",") + name;
+        if (!vocoders.empty()) summary.set("vocoders", names);
+        vocoders.clear();
+        return summary;
+      },
+      .collect =
+          [&vocoders](const ValueMap& state, const ValueMap& message) {
+            const std::string rate = textOf(message.find(kRate));
+            if (TWReportingUtilityKeyIsPresentAndHasChanged(kVocoder, &message, &state) &&
+                !rate.starts_with("0.")) {
+              vocoders.insert(message.text(kVocoder) + ":" + rate);
+            }
+          }};
+}
+
+RC_GTEST_FIXTURE_PROP(InputMessagesTest, SummarisesLikeAWalkThatMergesEveryMessage, ()) {
+  std::set<std::string> vocoders;
+  checkAgainst(
+      plainWalk(vocoders),
+      {kRunning, kRunning, kDevices, kVocoder, kRate, "session_duration", "spatializationEnabled",
+       "spatial-audio-accessory-feature", "vp_config_operation_mode", "vp_config_input_port", "other"},
+      2.0);
+}
+
 }  // namespace
 }  // namespace tonewerk

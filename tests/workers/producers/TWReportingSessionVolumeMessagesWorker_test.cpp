@@ -252,5 +252,52 @@ RC_GTEST_FIXTURE_PROP(VolumeMessagesTest, SurvivesAnyStream, ()) {
       [](const TWReportingSessionMessage& summary) { RC_ASSERT(summary.message.size() == 14U); });
 }
 
+PlainWalk plainWalk() {
+  return {.runningKey = kRunning,
+          .open = PlainWalk::Open::kIgnored,
+          .state = {{"session_selected_format", "unknown"},
+                    {"active_devices", "unknown"},
+                    {"mFormatID", "unknown"},
+                    {"spatial-audio-accessory-feature", false},
+                    {"spatializationEnabled", false},
+                    {"ringerstate", false},
+                    {"mChannelsPerFrame", -1}},
+          .endsInterval =
+              [](const ValueMap& state, const ValueMap& message) {
+                return PlainWalk::changesText(state, message, "session_selected_format") ||
+                       PlainWalk::changesText(state, message, "active_devices") ||
+                       PlainWalk::changesNumber(state, message, "spatializationEnabled") ||
+                       PlainWalk::changesNumber(state, message, "ringerstate") ||
+                       PlainWalk::changesNumber(state, message, kVolume);
+              },
+          .summaryOf = [](const ValueMap& state, double seconds, int index) -> std::optional<ValueMap> {
+            if (!state.contains(kVolume)) return std::nullopt;
+            return ValueMap{
+                {"session_selected_format", *state.find("session_selected_format")},
+                {"mFormatID", *state.find("mFormatID")},
+                {"active_devices", *state.find("active_devices")},
+                {"HostApplicationDisplayID", "com.orvane.player"},
+                {kVolume, *state.find(kVolume)},
+                {"QMSessionVolumeBucketed",
+                 *TWReportingUtilityBucketNumberToString(state.number(kVolume),
+                                                         TWReportingUtilityBucketNumberToStringVolumes, 4)},
+                {"play_seconds", PlainWalk::singlePrecision(seconds)},
+                {"spatial-audio-accessory-feature", *state.find("spatial-audio-accessory-feature")},
+                {"spatializationEnabled", *state.find("spatializationEnabled")},
+                {"ringerstate", *state.find("ringerstate")},
+                {"mChannelsPerFrame", *state.find("mChannelsPerFrame")},
+                {"play_secondsBucketed", PlainWalk::bucketed(seconds)},
+                {"msgidx", index}};
+          }};
+}
+
+RC_GTEST_FIXTURE_PROP(VolumeMessagesTest, SummarisesLikeAWalkThatMergesEveryMessage, ()) {
+  checkAgainst(plainWalk(),
+               {kRunning, kRunning, kVolume, "session_duration", "active_devices", "spatializationEnabled",
+                "spatial-audio-accessory-feature", "ringerstate", "mFormatID", "session_selected_format",
+                "mChannelsPerFrame", "other"},
+               5.0);
+}
+
 }  // namespace
 }  // namespace tonewerk
