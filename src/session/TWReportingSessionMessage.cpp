@@ -3,6 +3,8 @@
 
 #include <algorithm>
 #include <cmath>
+#include <cstddef>
+#include <limits>
 #include <utility>
 
 #include "platform/Log.h"
@@ -10,6 +12,14 @@
 #include "session/TWReportingUtility.h"
 
 namespace tonewerk {
+namespace {
+
+double sortedTimeOf(const TWReportingSessionMessage& record) {
+  const double time = record.epochTime();
+  return std::isnan(time) ? 0.0 : time;
+}
+
+}  // namespace
 
 TWReportingSessionMessage::TWReportingSessionMessage(ValueMap payload, AudioEventCategory messageCategory,
                                                      AudioEventType messageType)
@@ -33,21 +43,30 @@ double TWReportingSessionMessage::epochTime() const {
 }
 
 void TWReportingSessionMessage::sortMessages(TWReportingSessionMessages& messages) {
-  // Each time is read once, not at every comparison.
+  // Mostly the messages came in order. Then they are neither moved nor copied.
+  double latest = -std::numeric_limits<double>::infinity();
+  const auto isLate = [&latest](const auto& record) {
+    const double time = sortedTimeOf(*record);
+    if (time < latest) return true;
+    latest = time;
+    return false;
+  };
+  if (std::none_of(messages.begin(), messages.end(), isLate)) return;
+
+  // Each time is read once, not at every comparison. Places take less to move than records.
   struct Timed {
     double time;
-    std::shared_ptr<TWReportingSessionMessage> message;
+    std::size_t place;
   };
-  const auto earlier = [](const Timed& a, const Timed& b) { return a.time < b.time; };
   std::vector<Timed> timed;
   timed.reserve(messages.size());
-  for (auto& message : messages) {
-    const double time = message->epochTime();
-    timed.push_back({std::isnan(time) ? 0.0 : time, std::move(message)});
-  }
-  if (!std::is_sorted(timed.begin(), timed.end(), earlier))
-    std::stable_sort(timed.begin(), timed.end(), earlier);
-  for (std::size_t at = 0; at < timed.size(); ++at) messages[at] = std::move(timed[at].message);
+  for (const auto& record : messages) timed.push_back({sortedTimeOf(*record), timed.size()});
+  std::stable_sort(timed.begin(), timed.end(),
+                   [](const Timed& a, const Timed& b) { return a.time < b.time; });
+  TWReportingSessionMessages sorted;
+  sorted.reserve(messages.size());
+  for (const Timed& one : timed) sorted.push_back(std::move(messages[one.place]));
+  messages = std::move(sorted);
 }
 
 void TWReportingSessionMessage::lock() const {

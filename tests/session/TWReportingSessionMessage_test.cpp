@@ -1,10 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "session/TWReportingSessionMessage.h"
 
+#include <algorithm>
 #include <cmath>
+#include <cstdlib>
 #include <gtest/gtest.h>
 #include <mutex>
+#include <rapidcheck/gtest.h>
 #include <thread>
+#include <vector>
 
 #include "support/ReportingTest.h"
 #include "workers/sinks/TWReportingSessionMetriconWorker.h"
@@ -75,6 +79,22 @@ TEST_F(TWReportingSessionMessageTest, SortsATimeThatIsNotANumberAsNoTime) {
                                       messageAt(1, {{"n", "c"}}), messageAt(-1, {{"n", "d"}})};
   TWReportingSessionMessage::sortMessages(messages);
   EXPECT_THAT(textsUnder("n", messages), ElementsAre("d", "b", "c", "a"));
+}
+
+RC_GTEST_FIXTURE_PROP(TWReportingSessionMessageTest, SortsLikeAStableSortOfTheTimes, ()) {
+  TWReportingSessionMessages messages;
+  double time = 0;
+  for (const int step : *rc::gen::container<std::vector<int>>(rc::gen::inRange(-1, 4))) {
+    time += *rc::gen::inRange(0, 8) == 0 ? step : std::abs(step);  // mostly in order
+    messages.push_back(*rc::gen::inRange(0, 20) == 0 ? message({}) : messageAt(time, {}));
+  }
+  TWReportingSessionMessages expected = messages;
+  std::stable_sort(expected.begin(), expected.end(),
+                   [](const auto& a, const auto& b) { return a->epochTime() < b->epochTime(); });
+  RC_CLASSIFY(expected == messages, "in order");
+
+  TWReportingSessionMessage::sortMessages(messages);
+  RC_ASSERT(messages == expected);  // the same records
 }
 
 TEST_F(TWReportingSessionMessageTest, ItsLockExcludesOthers) {
