@@ -24,6 +24,8 @@ namespace {
 
 constexpr mode_t kFileMode = 0644;
 constexpr std::string_view kHiddenPrefix = ".new-";
+// Writers give short lines; one system call for each costs more than everything else.
+constexpr std::size_t kBlockBytes = std::size_t{256} << 10;
 
 bool isPlainName(std::string_view name) {
   return !name.empty() && name != "." && name != ".." && name.find('/') == std::string_view::npos &&
@@ -84,14 +86,19 @@ class HiddenFile final : public NewFile {
   ~HiddenFile() override { remove(); }
 
   [[nodiscard]] std::error_code write(std::string_view text) override {
-    const std::error_code error = writeAll(file_.get(), text);
-    if (error && !failure_) failure_ = error;
-    return error;
+    if (failure_) return failure_;
+    if (waiting_.size() + text.size() > kBlockBytes) {
+      if (const std::error_code error = writeWaiting()) return error;
+    }
+    if (text.size() > kBlockBytes) return failure_ = writeAll(file_.get(), text);
+    waiting_ += text;
+    return {};
   }
 
   [[nodiscard]] std::error_code place(const std::string& name) override {
     if (!isPlainName(name)) return std::make_error_code(std::errc::invalid_argument);
     if (failure_) return failure_;
+    if (const std::error_code error = writeWaiting()) return error;
     // Without this, the file could be incomplete or empty after a crash of the system.
     if (fsync(file_.get()) != 0) return failure_ = lastSystemError();
     std::error_code error = renameToNew(directory_.get(), hiddenName_, directory_.get(), name);
@@ -104,6 +111,12 @@ class HiddenFile final : public NewFile {
 
  private:
   static constexpr int kMaxAttempts = 8;
+
+  [[nodiscard]] std::error_code writeWaiting() {
+    failure_ = writeAll(file_.get(), waiting_);
+    waiting_.clear();
+    return failure_;
+  }
 
   // Another process may take the new file for a leftover before it is locked. Then the next attempt creates
   // another file. If that happens at every attempt, the other process is not looking for leftovers.
@@ -154,7 +167,8 @@ class HiddenFile final : public NewFile {
   FileDescriptor directory_;
   std::string hiddenName_;  // empty until the file exists, and after it was placed
   FileDescriptor file_;
-  std::error_code failure_;
+  std::string waiting_;      // not written yet, at most kBlockBytes
+  std::error_code failure_;  // the first one
 };
 
 // Removes the file if it is a leftover: a regular file of this user that no process has locked. The lock is

@@ -94,6 +94,21 @@ TYPED_TEST(FileSystemContract, AFileIsThereWhenItIsPlacedAndNotBefore) {
   EXPECT_EQ(this->kind_.contents(this->path("d/name.json")), "one two");
 }
 
+TYPED_TEST(FileSystemContract, ShortAndLongTextsStayInOrder) {
+  const auto file = this->create("name.json");
+  ASSERT_NE(file, nullptr);
+  std::string expected;
+  const auto write = [&](const std::string& text) {
+    EXPECT_FALSE(file->write(text));
+    expected += text;
+  };
+  for (int line = 0; line < 50'000; ++line) write(std::to_string(line) + "\n");
+  write(std::string(std::size_t{1} << 20, 'x'));
+  write("end");
+  EXPECT_FALSE(file->place("name.json"));
+  EXPECT_TRUE(this->kind_.contents(this->path("d/name.json")) == expected);  // too long to be printed
+}
+
 TYPED_TEST(FileSystemContract, AFileThatIsNotPlacedLeavesNothing) {
   EXPECT_FALSE(this->create("name")->write("x"));
   EXPECT_FALSE(this->kind_.files.exists(this->path("d/name")));
@@ -410,6 +425,41 @@ TEST(LinuxFileSystemTest, AFileIsNotPlacedOnAFullDisk) {
   EXPECT_EQ(file->place("a.json"), std::errc::no_space_on_device);
   file.reset();
   EXPECT_THAT(namesIn(directory.path()), IsEmpty());
+}
+
+TEST(LinuxFileSystemTest, AfterAFailureForEarlierLinesNoLineIsWritten) {
+  const TemporaryDirectory directory;
+  const SmallFileSystem small(directory.path());
+  if (!small.isMounted()) GTEST_SKIP() << "only root can make a file system";
+  LinuxFileSystem files;
+  std::error_code error;
+  const auto file = files.createFile(directory.path(), "a.json", error);
+  ASSERT_NE(file, nullptr);
+  const std::string line(1000, 'x');
+  constexpr int kMoreThanFits = 2000;
+  int written = 0;
+  while (written < kMoreThanFits && !file->write(line)) ++written;
+  EXPECT_LT(written, kMoreThanFits);
+  ASSERT_TRUE(small.grow());
+  EXPECT_EQ(file->write("x"), std::errc::no_space_on_device);
+  EXPECT_EQ(file->place("a.json"), std::errc::no_space_on_device);
+  EXPECT_THAT(namesIn(directory.path()), ElementsAre(StartsWith(".new-")));
+}
+
+TEST(LinuxFileSystemTest, AFileWhoseLastTextDoesNotFitIsNotPlaced) {
+  const TemporaryDirectory directory;
+  const SmallFileSystem small(directory.path());
+  if (!small.isMounted()) GTEST_SKIP() << "only root can make a file system";
+  LinuxFileSystem files;
+  std::error_code error;
+  const auto file = files.createFile(directory.path(), "a.json", error);
+  ASSERT_NE(file, nullptr);
+  std::ofstream other(directory.path("other"));
+  const std::string block(4096, 'x');
+  while (other.write(block.data(), static_cast<std::streamsize>(block.size())).flush()) continue;
+  EXPECT_FALSE(file->write("text"));
+  EXPECT_EQ(file->place("a.json"), std::errc::no_space_on_device);
+  EXPECT_FALSE(files.exists(directory.path("a.json")));
 }
 
 // Intercepts system calls of the file system.
