@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/json/NlohmannJsonService.h"
 
+#include <algorithm>
 #include <cmath>
 #include <limits>
 #include <nlohmann/json.hpp>
@@ -55,8 +56,7 @@ class PrettyWriter {
   // False if JSON cannot express a value; problem() then names it.
   bool write(const ValueMap& map) {
     return writeList('{', '}', map, [this](const ValueMap::Entry& entry, std::size_t) {
-      appendCompactJson(out_, Value(entry.key));
-      out_ += ": ";
+      writeKey(entry.key);
       return write(entry.value) || isWithin(entry.key.string());
     });
   }
@@ -77,6 +77,22 @@ class PrettyWriter {
     }
     appendCompactJson(out_, value);
     return true;
+  }
+
+  // Nearly all keys need no escapes, and for those no value has to be made.
+  void writeKey(const SharedString& key) {
+    const std::string_view text = key;
+    const auto needsEscape = [](char c) {
+      return static_cast<unsigned char>(c) < 0x20 || c == '"' || c == '\\';
+    };
+    if (std::none_of(text.begin(), text.end(), needsEscape)) {
+      out_ += '"';
+      out_ += text;
+      out_ += '"';
+    } else {
+      appendCompactJson(out_, Value(key));
+    }
+    out_ += ": ";
   }
 
   template <typename List, typename WriteElement>
@@ -180,6 +196,7 @@ std::string NlohmannJsonService::compact(const ValueMap& map) const { return map
 
 std::optional<std::string> NlohmannJsonService::pretty(const ValueMap& map, std::string& problem) const {
   std::string text;
+  text.reserve(map.bytes() + map.bytes() / 4);  // mostly enough
   PrettyWriter writer(text);
   if (writer.write(map)) return text;
   problem = writer.problem();
