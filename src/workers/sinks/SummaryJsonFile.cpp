@@ -80,9 +80,8 @@ void SummaryJsonFile::writeLine(std::string_view text) {
 void SummaryJsonFile::writeMessage(AudioEventCategory category, AudioEventType type,
                                    const ValueMap& payload) {
   if (reportPath_.empty()) openFile();
-  std::string member = TWReportingUtilityCategoryString(category) + "_" + TWReportingUtilityTypeString(type);
-  const std::size_t count = ++counts_[member];
-  member += "_" + std::to_string(count);
+  const Kind& kind = kindOf(category, type);
+  const std::string member = kind.name + "_" + std::to_string(++*kind.count);
   std::string problem;
   const auto text =
       TWReportingContext::current().platform().json.pretty(ValueMap{{member, payload}}, problem);
@@ -93,6 +92,16 @@ void SummaryJsonFile::writeMessage(AudioEventCategory category, AudioEventType t
   }
   if (std::exchange(hasEntry_, true)) writeLine(",");
   writeLine(*text);
+}
+
+const SummaryJsonFile::Kind& SummaryJsonFile::kindOf(AudioEventCategory category, AudioEventType type) {
+  const auto [place, isNew] = kinds_.try_emplace({category, type});
+  Kind& kind = place->second;
+  if (isNew) {
+    kind.name = TWReportingUtilityCategoryString(category) + "_" + TWReportingUtilityTypeString(type);
+    kind.count = &counts_[kind.name];
+  }
+  return kind;
 }
 
 void SummaryJsonFile::closeFile() {

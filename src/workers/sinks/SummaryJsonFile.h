@@ -1,12 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <cstddef>
 #include <functional>
+#include <map>
 #include <memory>
 #include <string>
 #include <string_view>
 #include <system_error>
-#include <unordered_map>
+#include <utility>
 
 #include "protocol/AudioEvent.h"
 #include "values/Value.h"
@@ -45,7 +47,13 @@ class SummaryJsonFile {
   void closeFile();
 
  private:
+  struct Kind {
+    std::string name;              // as in "Volume_Summary"
+    std::size_t* count = nullptr;  // how many messages of this name the file has had
+  };
+
   void openFile();
+  const Kind& kindOf(AudioEventCategory category, AudioEventType type);
   // Calls `attempt` with one name after the other while it fails because the name is taken. Returns its last
   // error.
   [[nodiscard]] std::error_code withFreeName(
@@ -58,7 +66,9 @@ class SummaryJsonFile {
   std::string reportPath_;  // empty until the first message
   std::unique_ptr<NewFile> reportFileHandle_;
   bool hasEntry_ = false;  // whether an entry with a text was written
-  std::unordered_map<std::string, std::size_t> counts_;
+  std::map<std::string, std::size_t> counts_;
+  // By category and type. Categories of the same text share a count.
+  std::map<std::pair<AudioEventCategory, AudioEventType>, Kind> kinds_;
 };
 
 }  // namespace tonewerk

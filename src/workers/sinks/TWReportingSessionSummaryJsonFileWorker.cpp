@@ -23,6 +23,10 @@ struct Entry {
   ValueMap payload;
 };
 
+// Made once, so that a message gets one without an allocation.
+const Value kYes("YES");
+const Value kNo("NO");
+
 }  // namespace
 
 const TWReportingSessionWorkerClass TWReportingSessionSummaryJsonFileWorker::kWorkerClass =
@@ -55,10 +59,11 @@ void TWReportingSessionSummaryJsonFileWorker::stop() {
   const auto owner = session.lock();
   if (owner == nullptr || owner->messages().empty()) return;
   std::vector<Entry> entries;
+  entries.reserve(owner->messages().size());
   std::size_t bytes = 0;
   for (const auto& message : owner->messages()) {
     if (message->isRedundant) continue;
-    message->message.set(TWReportingMessageKeyIsSessionStarted, message->isSessionStarted ? "YES" : "NO");
+    message->message.set(TWReportingMessageKeyIsSessionStarted, message->isSessionStarted ? kYes : kNo);
     bytes += sizeof(Entry) + message->message.bytes();
     entries.push_back({message->category, message->type, message->message});
   }
