@@ -13,12 +13,13 @@ namespace {
 class JoinedTexts {
  public:
   void add(const SharedString& key, const Value& value) {
-    const auto [place, isNew] = places_.try_emplace(key, texts_.size());
-    if (isNew) {
+    const std::size_t place = placeOf(key);
+    guess_ = place + 1;
+    if (place == texts_.size()) {
       texts_.push_back({key, value.text()});
       return;
     }
-    std::string& text = texts_[place->second].text;
+    std::string& text = texts_[place].text;
     text += ',';
     if (const SharedString* same = value.asString()) {
       text += same->view();
@@ -42,7 +43,14 @@ class JoinedTexts {
   struct KeyHash {
     std::size_t operator()(const SharedString& key) const { return key.hash(); }
   };
+  // The number of texts when the key is new.
+  std::size_t placeOf(const SharedString& key) {
+    if (guess_ < texts_.size() && texts_[guess_].key.sharesStorageWith(key)) return guess_;
+    return places_.try_emplace(key, texts_.size()).first->second;
+  }
+
   std::vector<Text> texts_;
+  std::size_t guess_ = 0;  // messages of one kind mostly have their keys in the same order
   std::unordered_map<SharedString, std::size_t, KeyHash> places_;
 };
 
