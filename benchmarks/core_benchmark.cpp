@@ -5,11 +5,9 @@
 // stored messages, keys and sessions. Also measures the payload's map alone.
 
 #include <benchmark/benchmark.h>
-#include <chrono>
 #include <cstdint>
 #include <malloc.h>
 #include <memory>
-#include <optional>
 #include <string>
 #include <utility>
 #include <vector>
