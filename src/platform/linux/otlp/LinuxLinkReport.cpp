@@ -44,13 +44,14 @@ class LinuxLinkReport::Session final : public LinkReportSession {
   }
 
   void startConfigurationWithCompletionHandler(CompletionHandler handler) override {
-    const LinkReportBackends backends = service_.readBackends();
+    const ValueMap preferences = service_.preferences_.readAll(kPreferenceDomain);
+    const LinkReportBackends backends = service_.backendsOf(preferences);
     isLocal_ = backends.local;
     exporters_.clear();
     for (const auto& endpoint : backends.endpoints) {
       if (OtlpExporter* exporter = service_.exporterFor(endpoint.url)) exporters_.push_back(exporter);
     }
-    repeatsEventName_ = booleanPreference(kEventNameAttributeKey);
+    repeatsEventName_ = preferences.boolean(kEventNameAttributeKey);
     if (isLocal_) {
       stored_->startedAt = service_.clock_.now();
       service_.store_.record(RtcSessionRow{stored_});
@@ -92,11 +93,6 @@ class LinuxLinkReport::Session final : public LinkReportSession {
     for (OtlpExporter* exporter : exporters_) (void)exporter->add(record, urgency_);
   }
 
-  bool booleanPreference(std::string_view key) const {
-    const std::optional<Value> value = service_.preferences_.read(kPreferenceDomain, key);
-    return value && value->boolean();
-  }
-
   LinuxLinkReport& service_;
   const std::int64_t sessionIdentifier_;
   const OtlpOutbox::Urgency urgency_;
@@ -132,8 +128,10 @@ std::unique_ptr<LinkReportSession> LinuxLinkReport::initWithSessionInfo(
   return std::make_unique<Session>(*this, sessionInfo, userInfo);
 }
 
-LinkReportBackends LinuxLinkReport::readBackends() {
-  LinkReportBackends backends = LinkReportBackends::from(preferences_.read(kPreferenceDomain, kBackendsKey));
+LinkReportBackends LinuxLinkReport::backendsOf(const ValueMap& preferences) {
+  const Value* configured = preferences.find(kBackendsKey);
+  LinkReportBackends backends =
+      LinkReportBackends::from(configured == nullptr ? std::nullopt : std::optional(*configured));
   std::string problems;
   for (const std::string& problem : backends.problems) problems += problem + "; ";
   if (!problems.empty() && problems != loggedProblems_) {

@@ -58,7 +58,8 @@ class LinuxLinkReport final : public LinkReport {
  private:
   class Session;
 
-  LinkReportBackends readBackends();
+  // The backends that the domain's `preferences` name. Logs new problems.
+  LinkReportBackends backendsOf(const ValueMap& preferences);
   // Null if there are already kMaxExporters exporters.
   [[nodiscard]] OtlpExporter* exporterFor(const std::string& url);
   OtlpResource resource() const;

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/preferences/TomlFile.h"
 
+#include <cerrno>
 #include <sys/stat.h>
 
 #include "platform/Log.h"
@@ -10,8 +11,12 @@
 namespace tonewerk {
 
 void TomlFile::refresh() {
-  struct stat status {};
-  if (stamp_ && stat(path_.c_str(), &status) == 0 && FileStamp::of(status) == *stamp_) return;
+  if (stamp_ || isMissing_) {
+    struct stat status {};
+    const bool isThere = stat(path_.c_str(), &status) == 0;
+    if (stamp_ && isThere && FileStamp::of(status) == *stamp_) return;
+    if (isMissing_ && !isThere && errno == ENOENT) return;
+  }
   read();
 }
 
@@ -20,7 +25,8 @@ void TomlFile::read() {
   std::string text;
   struct stat status {};
   const std::error_code error = readFileBytes(path_, text, &status);
-  if (error == std::errc::no_such_file_or_directory) {
+  isMissing_ = error == std::errc::no_such_file_or_directory;
+  if (isMissing_) {
     values_ = {};
     problem_.clear();
     return;

@@ -34,6 +34,7 @@ class TomlFile {
   const std::string path_;
   const LogCategory& log_;
   std::optional<FileStamp> stamp_;  // of the file that was read; none if a change might not alter the stamp
+  bool isMissing_ = false;          // the last read() found no file
   ValueMap values_;
   std::string problem_;
   std::optional<FileStamp> loggedStamp_;  // of the file whose problem was logged last

@@ -95,9 +95,7 @@ TomlPreferenceStore::TomlPreferenceStore(std::string configurationDirectory, std
       stateDirectory_(std::move(stateDirectory)),
       log_(log) {}
 
-TomlPreferenceStore::Contents TomlPreferenceStore::contentsOf(std::string_view domain) const {
-  if (!isDomain(domain)) return {};
-  const MutexLock lock(mutex_);
+TomlPreferenceStore::Domain& TomlPreferenceStore::refreshed(std::string_view domain) const {
   auto found = domains_.find(domain);
   if (found == domains_.end()) {
     const std::string file = "/" + fileNameOf(domain);
@@ -109,6 +107,13 @@ TomlPreferenceStore::Contents TomlPreferenceStore::contentsOf(std::string_view d
   Domain& held = found->second;
   held.configured.refresh();
   held.written.refresh();
+  return held;
+}
+
+TomlPreferenceStore::Contents TomlPreferenceStore::contentsOf(std::string_view domain) const {
+  if (!isDomain(domain)) return {};
+  const MutexLock lock(mutex_);
+  const Domain& held = refreshed(domain);
   return {held.configured.values(), held.written.values(), held.written.problem()};
 }
 
@@ -133,9 +138,11 @@ TomlPreferenceStore::Layers TomlPreferenceStore::readLayers(std::string_view dom
 }
 
 std::optional<Value> TomlPreferenceStore::read(std::string_view domain, std::string_view key) const {
-  const Contents contents = contentsOf(domain);
-  const Value* value = contents.written.find(key);
-  if (value == nullptr) value = contents.configured.find(key);
+  if (!isDomain(domain)) return std::nullopt;
+  const MutexLock lock(mutex_);
+  const Domain& held = refreshed(domain);
+  const Value* value = held.written.values().find(key);
+  if (value == nullptr) value = held.configured.values().find(key);
   return value == nullptr ? std::nullopt : std::optional(*value);
 }
 

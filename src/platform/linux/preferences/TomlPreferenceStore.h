@@ -65,6 +65,8 @@ class TomlPreferenceStore final : public PreferenceStore {
     std::string problem;  // why `written` must not be overwritten
   };
   Contents contentsOf(std::string_view domain) const;
+  // The domain, which must be one, after its files were read again where they have changed.
+  Domain& refreshed(std::string_view domain) const REQUIRES(mutex_);
   // Holds the writers' lock, calls `change` with the domain's contents and then stores `written`.
   template <typename Change>
   [[nodiscard]] std::error_code update(std::string_view domain, std::string* problem, Change change);

@@ -96,6 +96,19 @@ TEST_F(TomlPreferenceStoreTest, ReadsAFileThatWasEditedInPlace) {
   EXPECT_EQ(store_.read(kDomain, "a"), Value(2));
 }
 
+// While a file is missing, the store looks only for its appearance.
+TEST_F(TomlPreferenceStoreTest, ReadsAFileEachTimeThatItAppears) {
+  for (const std::string& path : {configured(), written()}) {
+    for (int number = 1; number <= 3; ++number) {
+      EXPECT_EQ(store_.read(kDomain, "a"), std::nullopt);
+      EXPECT_EQ(store_.read(kDomain, "a"), std::nullopt);
+      write(path, "a = " + std::to_string(number) + "\n");
+      EXPECT_EQ(store_.read(kDomain, "a"), Value(number));
+      std::filesystem::remove_all(std::filesystem::path(path).parent_path());
+    }
+  }
+}
+
 TEST_F(TomlPreferenceStoreTest, WritersDoNotLoseEachOthersKeys) {
   constexpr int kWriters = 4;
   constexpr int kKeys = 25;
