@@ -1,9 +1,16 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/system/LinuxProcessInformation.h"
 
+#include <array>
+#include <cerrno>
 #include <ctime>
+#include <fcntl.h>
+#include <string>
+#include <string_view>
+#include <system_error>
 #include <unistd.h>
 
+#include "platform/linux/descriptors/FileDescriptor.h"
 #include "platform/linux/files/KeyValueLines.h"
 #include "platform/linux/files/TextFile.h"
 
@@ -11,6 +18,29 @@ namespace tonewerk {
 namespace {
 
 constexpr std::uint64_t kKibibyte = 1024;
+
+bool hasSwapLine(std::string_view status) {
+  const std::size_t line = status.find("\nVmSwap:");
+  return line != std::string_view::npos && status.find('\n', line + 1) != std::string_view::npos;
+}
+
+// Reads a status file up to the line of the swapped memory; to its end if it has none. What comes after that
+// line is not needed, and without it one call of the system is enough.
+std::error_code readThroughSwapLine(const std::string& path, std::string& status) {
+  const FileDescriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC | O_NOCTTY));
+  if (!file) return lastSystemError();
+  std::array<char, 4096> block;
+  while (!hasSwapLine(status)) {
+    const ssize_t count = ::read(file.get(), block.data(), block.size());
+    if (count == 0) break;
+    if (count > 0) {
+      status.append(block.data(), static_cast<std::size_t>(count));
+    } else if (errno != EINTR) {
+      return lastSystemError();
+    }
+  }
+  return {};
+}
 
 }  // namespace
 
@@ -26,12 +56,12 @@ std::optional<std::string> LinuxProcessInformation::processName(std::int32_t pro
 std::int32_t LinuxProcessInformation::ownProcessIdentifier() const { return getpid(); }
 
 std::variant<std::uint64_t, std::string> LinuxProcessInformation::physicalFootprint() const {
-  const std::string path = procDirectory_ + "/self/status";
   std::string status;
-  if (const std::error_code error = readTextFile(path, status)) return error.message();
-  const KeyValueLines lines(status);
+  if (const std::error_code error = readThroughSwapLine(statusPath_, status)) return error.message();
+  const std::size_t wanted = status.find("\nRssAnon:");  // the line of the swapped memory comes later
+  const KeyValueLines lines(std::string_view(status).substr(wanted == std::string::npos ? 0 : wanted + 1));
   const auto resident = lines.number("RssAnon");
-  if (!resident) return "no RssAnon in " + path;
+  if (!resident) return "no RssAnon in " + statusPath_;
   // Kernels built without swap support do not write VmSwap.
   return (*resident + lines.number("VmSwap").value_or(0)) * kKibibyte;
 }

@@ -10,7 +10,7 @@ class LinuxProcessInformation final : public ProcessInformation {
  public:
   // Tests pass another directory instead of "/proc".
   explicit LinuxProcessInformation(std::string procDirectory = "/proc")
-      : procDirectory_(std::move(procDirectory)) {}
+      : procDirectory_(std::move(procDirectory)), statusPath_(procDirectory_ + "/self/status") {}
 
   // Reads PID/comm. The kernel cuts the name to 15 bytes; an incomplete character becomes U+FFFD.
   [[nodiscard]] std::optional<std::string> processName(std::int32_t processIdentifier) const override;
@@ -22,6 +22,7 @@ class LinuxProcessInformation final : public ProcessInformation {
 
  private:
   const std::string procDirectory_;
+  const std::string statusPath_;
 };
 
 }  // namespace tonewerk

@@ -61,6 +61,19 @@ TEST(LinuxProcessInformationTest, TheFootprintIsResidentAndSwappedAnonymousMemor
   EXPECT_EQ(std::get<std::uint64_t>(proc.information().physicalFootprint()), 1024U * 1024U);
 }
 
+TEST(LinuxProcessInformationTest, AFootprintIsReadFromALongStatus) {
+  const std::string groups = "Groups:\t" + std::string(9000, '7') + "\n";
+  MadeProc proc;
+  proc.write("self/status", groups + "RssAnon:\t 8 kB\nVmSwap:\t 2 kB\n" + groups);
+  EXPECT_EQ(std::get<std::uint64_t>(proc.information().physicalFootprint()), 10U * 1024U);
+}
+
+TEST(LinuxProcessInformationTest, AKernelWithoutSwapHasResidentMemoryOnly) {
+  MadeProc proc;
+  proc.write("self/status", "Name:\tx\nRssAnon:\t 8 kB\nThreads:\t1\n");
+  EXPECT_EQ(std::get<std::uint64_t>(proc.information().physicalFootprint()), 8U * 1024U);
+}
+
 TEST(LinuxProcessInformationTest, AFootprintThatCannotBeReadSaysWhy) {
   MadeProc proc;
   EXPECT_EQ(std::get<std::string>(proc.information().physicalFootprint()), "No such file or directory");
