@@ -17,10 +17,10 @@
 namespace tonewerk {
 namespace {
 
-constexpr std::string_view TWReportingClientNameTonewerk = "com.orvane.tonewerk";
-constexpr std::string_view TWReportingVersionNumber = "2.1";
+const Value TWReportingClientNameTonewerk("com.orvane.tonewerk");
+constexpr double TWReportingVersionNumber = 2.1;
 constexpr std::int64_t kClientType = 19;
-constexpr std::string_view kSessionIdentifierKey = "TWReportingSessionID";
+const SharedString kSessionIdentifierKey("TWReportingSessionID");
 
 }  // namespace
 
@@ -46,14 +46,16 @@ void RtcReporter::start(const Start& start) {
 ValueMap RtcReporter::sessionInfoOf(const Start& start, const std::string& token) {
   const bool batch =
       TWReportingSessionRtcWorker::shouldBatchLinkReportEventsForServiceType(start.serviceType);
-  ValueMap info{{kLinkReportSessionInfoClientType, kClientType},
-                {kLinkReportSessionInfoClientVersion, Value(TWReportingVersionNumber).number()},
-                {kLinkReportSessionInfoSessionID, start.reporterID},
-                {kLinkReportSessionInfoBatchEvent, batch},
-                {kLinkReportSessionInfoHierarchyToken, token},
-                {kLinkReportSessionInfoContainsRealtimeEvents, !batch}};
+  ValueMap info;
+  info.reserve(7);
+  info.add(kLinkReportSessionInfoClientType, kClientType);
+  info.add(kLinkReportSessionInfoClientVersion, TWReportingVersionNumber);
+  info.add(kLinkReportSessionInfoSessionID, start.reporterID);
+  info.add(kLinkReportSessionInfoBatchEvent, batch);
+  info.add(kLinkReportSessionInfoHierarchyToken, token);
+  info.add(kLinkReportSessionInfoContainsRealtimeEvents, !batch);
   if (const Value* application = start.configuration.find(TWReportingApplicationName)) {
-    info.set(kLinkReportSessionInfoClientBundleID, *application);
+    info.add(kLinkReportSessionInfoClientBundleID, *application);
   }
   return info;
 }
@@ -62,9 +64,11 @@ ValueMap RtcReporter::userInfoOf(const Start& start) {
   const std::string serviceName =
       start.isSingleMessageSession ? TWReportingUtilityGenerateServiceNameFromServiceType(start.serviceType)
                                    : start.serviceName;
-  ValueMap info{{kLinkReportUserInfoClientName, TWReportingClientNameTonewerk},
-                {kSessionIdentifierKey, start.reporterID},
-                {kLinkReportUserInfoServiceName, serviceName}};
+  ValueMap info;
+  info.reserve(3 + start.configuration.size());
+  info.add(kLinkReportUserInfoClientName, TWReportingClientNameTonewerk);
+  info.add(kSessionIdentifierKey, start.reporterID);
+  info.add(kLinkReportUserInfoServiceName, serviceName);
   info.merge(start.configuration);
   return info;
 }
