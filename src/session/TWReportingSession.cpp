@@ -23,6 +23,10 @@ constexpr std::size_t kRecordBytes = sizeof(TWReportingSessionMessage) + 64;
 
 const Value kUnknownName("Unknown");
 const Value kNilText("nil");
+const Value kYes("YES");
+const Value kNo("NO");
+const SharedString kMethod("method");
+const SharedString kReporterID("reporterid");
 
 std::string_view yesOrNo(bool answer) { return answer ? "YES" : "NO"; }
 
@@ -32,6 +36,26 @@ bool contains(const std::vector<const TWReportingSessionWorkerClass*>& classes,
 }
 
 }  // namespace
+
+// Made once, because every session adds the same texts.
+struct TWReportingSession::LifecycleTexts {
+  explicit LifecycleTexts(const std::string& name)
+      : method(name),
+        messagesAt("messages_at_" + name),
+        uniqueMessagesAt("unique_messages_at_" + name),
+        runningAt("running_at_" + name) {}
+
+  static const LifecycleTexts kStart;
+  static const LifecycleTexts kStop;
+
+  Value method;
+  SharedString messagesAt;
+  SharedString uniqueMessagesAt;
+  SharedString runningAt;
+};
+
+const TWReportingSession::LifecycleTexts TWReportingSession::LifecycleTexts::kStart("start");
+const TWReportingSession::LifecycleTexts TWReportingSession::LifecycleTexts::kStop("stop");
 
 std::shared_ptr<TWReportingSession> TWReportingSession::initWithID(ReporterID reporterID,
                                                                    ProcessIdentifiers processIdentifiers,
@@ -99,7 +123,8 @@ bool TWReportingSession::updateConfigurationWithContentsOfConfiguration(const Va
 
 void TWReportingSession::start() {
   assert(TWReportingUtilityIsOnReportingServerQueue());
-  (void)store(lifecycleMessage(kTypeStart, "start"));  // a start counts also when its message is not kept
+  (void)store(lifecycleMessage(kTypeStart,
+                               LifecycleTexts::kStart));  // a start counts also when its message is not kept
   infoLog(TWReportingSessionCategory(), "start called. reporterID=%lli", reporterID_);
   if (started_) {
     infoLog(TWReportingSessionCategory(), "%lli is already started", reporterID_);
@@ -115,8 +140,13 @@ void TWReportingSession::start() {
 void TWReportingSession::startWorkersFromClasses(
     const std::vector<const TWReportingSessionWorkerClass*>& classes) {
   assert(TWReportingUtilityIsOnReportingServerQueue());
+  {
+    const MutexLock lock(propertiesMutex_);
+    workers_.reserve(classes.size());
+  }
+  consumers_.reserve(classes.size());
   for (const TWReportingSessionWorkerClass* workerClass : classes) makeWorker(*workerClass);
-  for (const auto& worker : workersInOrder(Order::kConsumersFirst)) {
+  for (TWReportingSessionWorkerProtocol* worker : workersInOrder(Order::kConsumersFirst)) {
     if (!worker->started) startWorker(*worker);
   }
 }
@@ -138,7 +168,7 @@ void TWReportingSession::makeWorker(const TWReportingSessionWorkerClass& workerC
   debugLog(TWReportingSessionCategory(),
            "Initializing TWReportingSessionWorker. action=init worker=%@ reporterID=%lli", workerClass,
            reporterID_);
-  const auto worker = workerClass.initWithSession(shared_from_this());
+  auto worker = workerClass.initWithSession(shared_from_this());
   if (worker == nullptr) {
     // A later start tries again, because the service type may have changed by then.
     debugLog(TWReportingSessionCategory(),
@@ -146,16 +176,13 @@ void TWReportingSession::makeWorker(const TWReportingSessionWorkerClass& workerC
              workerClass, reporterID_);
     return;
   }
-  {
-    const MutexLock lock(propertiesMutex_);
-    initializedWorkerClasses_.push_back(&workerClass);
-    messageWorkers_.push_back(worker);
-    if (workerClass.isConsumer) consumingMessageWorkers_.push_back(worker);
-    if (workerClass.isProducer) producingMessageWorkers_.push_back(worker);
-  }
   if (workerClass.isConsumer) {
     auto& consumer = dynamic_cast<TWReportingSessionWorkerConsumerProtocol&>(*worker);
     consumers_.push_back({&consumer, &consumer.workerClass(), consumer.handleRedundantMessages()});
+  }
+  {
+    const MutexLock lock(propertiesMutex_);
+    workers_.push_back({&workerClass, std::move(worker)});
   }
   debugLog(TWReportingSessionCategory(), "TWReportingSessionWorker action=added worker=%@ reporterID=%lli",
            workerClass, reporterID_);
@@ -163,7 +190,8 @@ void TWReportingSession::makeWorker(const TWReportingSessionWorkerClass& workerC
 
 bool TWReportingSession::hasWorkerOf(const TWReportingSessionWorkerClass& workerClass) const {
   const MutexLock lock(propertiesMutex_);
-  return contains(initializedWorkerClasses_, workerClass);
+  return std::any_of(workers_.begin(), workers_.end(),
+                     [&](const MadeWorker& made) { return made.workerClass == &workerClass; });
 }
 
 void TWReportingSession::startWorker(TWReportingSessionWorkerProtocol& worker) {
@@ -175,18 +203,22 @@ void TWReportingSession::startWorker(TWReportingSessionWorkerProtocol& worker) {
            yesOrNo(worker.started), reporterID_);
 }
 
-// Returns each worker once, at the place where it comes first.
-TWReportingSession::Workers TWReportingSession::workersInOrder(Order order) const {
+// Returns each worker once. Workers that are both come with the role that `order` puts first. Their order within
+// a role is the one in which they were made.
+std::vector<TWReportingSessionWorkerProtocol*> TWReportingSession::workersInOrder(Order order) const {
+  using Class = TWReportingSessionWorkerClass;
   const bool consumersFirst = order == Order::kConsumersFirst;
+  const auto first = consumersFirst ? &Class::isConsumer : &Class::isProducer;
+  const auto second = consumersFirst ? &Class::isProducer : &Class::isConsumer;
+  const auto rankOf = [&](const Class& made) { return made.*first ? 0 : made.*second ? 1 : 2; };
+  std::vector<TWReportingSessionWorkerProtocol*> ordered;
   const MutexLock lock(propertiesMutex_);
-  Workers ordered = consumersFirst ? consumingMessageWorkers_ : producingMessageWorkers_;
-  const auto addMissing = [&ordered](const Workers& more) {
-    for (const auto& worker : more) {
-      if (std::find(ordered.begin(), ordered.end(), worker) == ordered.end()) ordered.push_back(worker);
+  ordered.reserve(workers_.size());
+  for (int rank = 0; rank < 3; ++rank) {
+    for (const MadeWorker& made : workers_) {
+      if (rankOf(*made.workerClass) == rank) ordered.push_back(made.worker.get());
     }
-  };
-  addMissing(consumersFirst ? producingMessageWorkers_ : consumingMessageWorkers_);
-  addMissing(messageWorkers_);
+  }
   return ordered;
 }
 
@@ -228,7 +260,8 @@ void TWReportingSession::deliver(const TWReportingSessionMessage& message) {
 
 void TWReportingSession::stop() {
   assert(TWReportingUtilityIsOnReportingServerQueue());
-  (void)store(lifecycleMessage(kTypeStop, "stop"));  // a stop counts even when its message is not stored
+  (void)store(lifecycleMessage(kTypeStop,
+                               LifecycleTexts::kStop));  // a stop counts even when its message is not stored
   debugLog(TWReportingSessionCategory(), "stop called. reporterID=%lli", reporterID_);
   if (!started_) return logUnkeptCount();
   debugLog(TWReportingSessionCategory(), "ending session. reporterID=%lli", reporterID_);
@@ -237,7 +270,7 @@ void TWReportingSession::stop() {
   newest_.clear();
   for (const auto& message : messages_) rememberAsNewest(*message);
 
-  for (const auto& worker : workersInOrder(Order::kProducersFirst)) {
+  for (TWReportingSessionWorkerProtocol* worker : workersInOrder(Order::kProducersFirst)) {
     if (!worker->started) continue;
     worker->stop();
     worker->started = false;
@@ -253,13 +286,16 @@ void TWReportingSession::stop() {
 }
 
 std::shared_ptr<TWReportingSessionMessage> TWReportingSession::lifecycleMessage(
-    AudioEventType type, const std::string& method) const {
+    AudioEventType type, const LifecycleTexts& texts) const {
+  constexpr std::size_t kEntries = 8;  // with those that are added below
   const std::uint64_t count = messages_.size();
-  ValueMap payload{{"method", method},
-                   {"messages_at_" + method, count},
-                   {"unique_messages_at_" + method, count},
-                   {"reporterid", reporterID_},
-                   {"running_at_" + method, yesOrNo(started_)}};
+  ValueMap payload;
+  payload.reserve(kEntries);
+  payload.add(kMethod, texts.method);
+  payload.add(texts.messagesAt, count);
+  payload.add(texts.uniqueMessagesAt, count);
+  payload.add(kReporterID, reporterID_);
+  payload.add(texts.runningAt, started_ ? kYes : kNo);
   auto message = std::make_shared<TWReportingSessionMessage>(std::move(payload), kCategorySetup, type);
   addMissingDates(*message);
   addAudioMessageTag(*message);
@@ -403,27 +439,38 @@ void TWReportingSession::addPreviousValues(const ValueMap& values) {
 
 std::size_t TWReportingSession::workerInstanceCount() const {
   const MutexLock lock(propertiesMutex_);
-  return messageWorkers_.size();
+  return workers_.size();
 }
 
 TWReportingSession::Workers TWReportingSession::messageWorkers() const {
+  Workers workers;
   const MutexLock lock(propertiesMutex_);
-  return messageWorkers_;
+  for (const MadeWorker& made : workers_) workers.push_back(made.worker);
+  return workers;
 }
 
 TWReportingSession::Workers TWReportingSession::consumingMessageWorkers() const {
-  const MutexLock lock(propertiesMutex_);
-  return consumingMessageWorkers_;
+  return workersWith(&TWReportingSessionWorkerClass::isConsumer);
 }
 
 TWReportingSession::Workers TWReportingSession::producingMessageWorkers() const {
+  return workersWith(&TWReportingSessionWorkerClass::isProducer);
+}
+
+TWReportingSession::Workers TWReportingSession::workersWith(bool TWReportingSessionWorkerClass::*role) const {
+  Workers workers;
   const MutexLock lock(propertiesMutex_);
-  return producingMessageWorkers_;
+  for (const MadeWorker& made : workers_) {
+    if (made.workerClass->*role) workers.push_back(made.worker);
+  }
+  return workers;
 }
 
 std::vector<const TWReportingSessionWorkerClass*> TWReportingSession::initializedWorkerClasses() const {
+  std::vector<const TWReportingSessionWorkerClass*> classes;
   const MutexLock lock(propertiesMutex_);
-  return initializedWorkerClasses_;
+  for (const MadeWorker& made : workers_) classes.push_back(made.workerClass);
+  return classes;
 }
 
 std::string TWReportingSession::description() const {

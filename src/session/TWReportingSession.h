@@ -125,7 +125,7 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   TransactionCompleteBlock transactionCompleteBlock;
 
  private:
-  // One of consumingMessageWorkers_, with what does not change about it.
+  // One of consumingMessageWorkers(), with what does not change about it.
   struct Consumer {
     TWReportingSessionWorkerConsumerProtocol* worker;
     const TWReportingSessionWorkerClass* workerClass;
@@ -133,12 +133,23 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   };
   enum class Order { kConsumersFirst, kProducersFirst };
 
+  // The texts of the message that a start or a stop adds.
+  struct LifecycleTexts;
+
+  // A worker of the session, and the class that made it.
+  struct MadeWorker {
+    const TWReportingSessionWorkerClass* workerClass;
+    TWReportingSessionWorkerClass::Worker worker;
+  };
+
   std::shared_ptr<TWReportingSessionMessage> lifecycleMessage(AudioEventType type,
-                                                              const std::string& method) const;
+                                                              const LifecycleTexts& texts) const;
   void makeWorker(const TWReportingSessionWorkerClass& workerClass);
   bool hasWorkerOf(const TWReportingSessionWorkerClass& workerClass) const;
   void startWorker(TWReportingSessionWorkerProtocol& worker);
-  Workers workersInOrder(Order order) const;
+  std::vector<TWReportingSessionWorkerProtocol*> workersInOrder(Order order) const;
+  // The workers whose class has `role`.
+  Workers workersWith(bool TWReportingSessionWorkerClass::*role) const;
   void deliver(const TWReportingSessionMessage& message);
   // The bytes that the session has taken from the budget.
   std::size_t keptBytes() const;
@@ -168,7 +179,7 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   std::map<std::pair<AudioEventCategory, AudioEventType>, const TWReportingSessionMessage*> newest_;
   std::size_t messageBytes_ = 0;          // taken from the budget for messages_
   std::uint64_t unkeptMessageCount_ = 0;  // delivered but not stored for lack of room, and not logged yet
-  std::vector<Consumer> consumers_;       // in the order of consumingMessageWorkers_, which own them
+  std::vector<Consumer> consumers_;       // in the order of consumingMessageWorkers(); workers_ owns them
   SharedString applicationName_;          // the one of configuration_
 
   // The properties that any thread may read. Only the work queue writes them.
@@ -176,10 +187,8 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   std::optional<std::string> clientProcessName_ GUARDED_BY(propertiesMutex_);
   ValueMap configuration_ GUARDED_BY(propertiesMutex_);
   ValueMap previousValues_ GUARDED_BY(propertiesMutex_);
-  Workers messageWorkers_ GUARDED_BY(propertiesMutex_);
-  Workers consumingMessageWorkers_ GUARDED_BY(propertiesMutex_);
-  Workers producingMessageWorkers_ GUARDED_BY(propertiesMutex_);
-  std::vector<const TWReportingSessionWorkerClass*> initializedWorkerClasses_ GUARDED_BY(propertiesMutex_);
+  // In the order in which they were made. None is removed while the session lives.
+  std::vector<MadeWorker> workers_ GUARDED_BY(propertiesMutex_);
 };
 
 }  // namespace tonewerk
