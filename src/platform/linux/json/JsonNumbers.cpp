@@ -36,9 +36,10 @@ std::vector<JsonNumber> numbersInJson(std::string_view text) {
   for (std::size_t at = 0; at < text.size();) {
     if (text[at] == '"') {
       at = endOfText(text, at);
-    } else if (const std::size_t size = leadingJsonNumber(text.substr(at)).size(); size > 0) {
+    } else if (text[at] == '-' || isDigit(text[at])) {
+      const std::size_t size = leadingJsonNumber(text.substr(at)).size();
       numbers.push_back({static_cast<std::uint32_t>(at), static_cast<std::uint32_t>(at + size)});
-      at += size;
+      at += std::max<std::size_t>(size, 1);
     } else {
       ++at;
     }
