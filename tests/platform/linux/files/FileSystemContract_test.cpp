@@ -429,7 +429,7 @@ TEST(LinuxFileSystemTest, AFileIsNotPlacedOnAFullDisk) {
 
 TEST(LinuxFileSystemTest, AfterAFailureForEarlierLinesNoLineIsWritten) {
   const TemporaryDirectory directory;
-  const SmallFileSystem small(directory.path());
+  SmallFileSystem small(directory.path());
   if (!small.isMounted()) GTEST_SKIP() << "only root can make a file system";
   LinuxFileSystem files;
   std::error_code error;
