@@ -9,13 +9,11 @@
 #include <stdexcept>
 #include <sys/socket.h>
 #include <sys/un.h>
+#include <utility>
 
 namespace tonewerk {
 namespace {
 
-// Different messages of each client. They are then sent again; for the server they are new messages.
-constexpr std::size_t kDifferentMessages = 4096;
-constexpr std::int64_t kFirstReporterID = 100;
 constexpr int kTimeoutMilliseconds = 30'000;
 constexpr char kNil = '\xc0';
 
@@ -42,13 +40,16 @@ void waitFor(std::vector<pollfd>& sockets) {
 
 }  // namespace
 
-IngestClients::IngestClients(const std::string& socketPath, std::size_t count, IngestMessages::Kind kind,
+IngestClients::IngestClients(const std::string& socketPath, std::vector<IngestClientPlan> plans,
                              std::int64_t serviceType) {
-  for (std::size_t at = 0; at < count; ++at) {
-    const std::int64_t reporterID = kFirstReporterID + static_cast<std::int64_t>(at);
-    clients_.push_back(
-        {connectTo(socketPath), IngestMessages(kind, reporterID, kDifferentMessages), "", 0, 0, 0, ""});
-    request(clients_.back(), IngestMessages::opening(reporterID, serviceType));
+  clients_.reserve(plans.size());
+  for (IngestClientPlan& plan : plans) {
+    clients_.push_back({connectTo(socketPath), std::move(plan), "", 0, 0, 0, ""});
+    Client& client = clients_.back();
+    for (std::size_t at = 0; at < client.plan.sessions; ++at) {
+      const std::int64_t reporterID = client.plan.firstReporterID + static_cast<std::int64_t>(at);
+      request(client, IngestMessages::opening(reporterID, serviceType));
+    }
   }
 }
 
@@ -74,8 +75,10 @@ void IngestClients::send(std::size_t messagesAClient, const Pace& pace) {
 }
 
 void IngestClients::stop() {
-  for (std::size_t at = 0; at < clients_.size(); ++at) {
-    request(clients_[at], IngestMessages::closing(kFirstReporterID + static_cast<std::int64_t>(at)));
+  for (Client& client : clients_) {
+    for (std::size_t at = 0; at < client.plan.sessions; ++at) {
+      request(client, IngestMessages::closing(client.plan.firstReporterID + static_cast<std::int64_t>(at)));
+    }
   }
 }
 
@@ -100,12 +103,15 @@ void IngestClients::sendSome(Client& client, std::size_t messages, const Pace& p
   if (!client.unsent.empty() && !write(client)) return;
   std::size_t room = std::min(messages - client.sent, pace.window - (client.sent - client.answered));
   if (room < messages - client.sent && room * 2 < pace.window) return;
+  IngestMessages& all = client.plan.messages;
   while (room > 0) {
-    const std::size_t count = std::min({room, pace.messagesAWrite, client.messages.count() - client.place});
-    const std::size_t from = client.place == 0 ? 0 : client.messages.endOf(client.place - 1);
-    const std::size_t end = client.messages.endOf(client.place + count - 1);
-    client.unsent.assign(client.messages.bytes(), from, end - from);
-    client.place = (client.place + count) % client.messages.count();
+    const std::size_t count = std::min({room, pace.messagesAWrite, all.count() - client.place});
+    const std::size_t from = client.place == 0 ? 0 : all.endOf(client.place - 1);
+    const std::size_t end = all.endOf(client.place + count - 1);
+    client.unsent.assign(all.bytes(), from, end - from);
+    stored_ += all.storedOfFirst(client.place + count) - all.storedOfFirst(client.place);
+    client.place = (client.place + count) % all.count();
+    if (client.place == 0) all.advanceTimes();
     client.sent += count;
     room -= count;
     if (!write(client)) return;

@@ -12,6 +12,9 @@ namespace tonewerk {
 namespace {
 
 constexpr std::size_t kFillWindow = 256;
+// Different messages of each client. They are then sent again; for the server they are new messages.
+constexpr std::size_t kDifferentMessages = 4096;
+constexpr std::int64_t kFirstReporterID = 100;
 
 // Service types. A session of the test service has all workers but the one of real-time communication.
 constexpr std::int64_t kLongFormAudio = 7;
@@ -43,12 +46,21 @@ std::size_t rowsOf(const IngestScenario& scenario) {
                                                           : scenario.messages + scenario.storedBefore;
 }
 
+std::vector<IngestClientPlan> plansOf(const IngestScenario& scenario) {
+  std::vector<IngestClientPlan> plans;
+  for (std::size_t at = 0; at < scenario.clients; ++at) {
+    const std::int64_t reporterID = kFirstReporterID + static_cast<std::int64_t>(at);
+    plans.push_back({reporterID, 1, IngestMessages::playback(scenario.kind, reporterID, kDifferentMessages)});
+  }
+  return plans;
+}
+
 }  // namespace
 
 IngestCost measureIngest(const IngestScenario& scenario, IngestServer side) {
   ServerProcess server;
   start(server, side);
-  IngestClients clients(server.socketPath(), scenario.clients, scenario.kind,
+  IngestClients clients(server.socketPath(), plansOf(scenario),
                         scenario.recordsCalls ? kLongFormAudio : kTest);
   clients.send(scenario.storedBefore / scenario.clients, {kFillWindow, kFillWindow});
   server.waitUntilIdle();

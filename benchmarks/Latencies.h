@@ -20,8 +20,10 @@ class Latencies {
     const auto before = std::chrono::steady_clock::now();
     call();
     const auto after = std::chrono::steady_clock::now();
-    nanoseconds_[count_++] = static_cast<std::int64_t>((after - before).count());
+    add(static_cast<std::int64_t>((after - before).count()));
   }
+
+  void add(std::int64_t nanoseconds) { nanoseconds_[count_++] = nanoseconds; }
 
   void sort() {
     nanoseconds_.resize(count_);

@@ -9,6 +9,7 @@
 #include <fcntl.h>
 #include <filesystem>
 #include <fstream>
+#include <optional>
 #include <sstream>
 #include <stdexcept>
 #include <sys/prctl.h>
@@ -37,6 +38,12 @@ std::string textOfFile(const std::string& path) {
   return text.str();
 }
 
+std::optional<std::uint64_t> numberAfter(const std::string& text, std::string_view label) {
+  const std::size_t at = text.find(label);
+  if (at == std::string::npos) return std::nullopt;
+  return std::strtoull(text.c_str() + at + label.size(), nullptr, 10);
+}
+
 // Runs in the child after fork(); only async-signal-safe calls are allowed.
 [[noreturn]] void execute(const std::vector<char*>& command, int output) {
   ::prctl(PR_SET_PDEATHSIG, SIGKILL);  // the child never outlives the benchmark
@@ -60,7 +67,8 @@ ServerProcess::~ServerProcess() {
   std::filesystem::remove_all(directory_, error);
 }
 
-void ServerProcess::start(const std::string& program, const std::vector<std::string>& arguments) {
+void ServerProcess::start(const std::string& program, const std::vector<std::string>& arguments,
+                          const std::string& socket) {
   for (const char* variable : kDirectoryVariables) ::setenv(variable, directory_.c_str(), 1);
   std::vector<char*> command{const_cast<char*>(program.c_str())};
   for (const std::string& argument : arguments) command.push_back(const_cast<char*>(argument.c_str()));
@@ -71,7 +79,7 @@ void ServerProcess::start(const std::string& program, const std::vector<std::str
   ::close(output);
   if (process_ < 0) throw std::runtime_error("cannot start " + program);
   const auto deadline = std::chrono::steady_clock::now() + kTimeout;
-  while (!std::filesystem::exists(socketPath())) {
+  while (!std::filesystem::exists(directory_ + "/" + socket)) {
     if (hasEnded()) failWithOutput(program + " has ended");
     if (std::chrono::steady_clock::now() > deadline) failWithOutput(program + " does not listen");
     std::this_thread::sleep_for(kStep);
@@ -101,13 +109,22 @@ std::map<std::string, ServerProcess::Processor> ServerProcess::processorTimeByTh
   return times;
 }
 
-std::size_t ServerProcess::peakMemory() const {
-  const std::string status = textOfFile("/proc/" + std::to_string(process_) + "/status");
-  constexpr std::string_view kLabel = "VmHWM:";
-  const std::size_t at = status.find(kLabel);
-  if (at == std::string::npos) return 0;
-  return static_cast<std::size_t>(std::atoll(status.c_str() + at + kLabel.size())) * 1024;
+std::size_t ServerProcess::peakMemory() const { return statusBytes("VmHWM:"); }
+std::size_t ServerProcess::residentMemory() const { return statusBytes("VmRSS:"); }
+
+std::map<std::string, std::uint64_t> ServerProcess::waitsByThread() const {
+  std::map<std::string, std::uint64_t> waits;
+  std::error_code error;
+  for (const auto& thread :
+       std::filesystem::directory_iterator("/proc/" + std::to_string(process_) + "/task", error)) {
+    const auto number = numberAfter(textOfFile(thread.path() / "status"), "\nvoluntary_ctxt_switches:");
+    if (number) waits[thread.path().filename()] = *number;
+  }
+  if (waits.empty()) failWithOutput("the server has ended");
+  return waits;
 }
+
+std::string ServerProcess::output() const { return textOfFile(directory_ + "/output"); }
 
 void ServerProcess::waitUntilIdle() const {
   const auto deadline = std::chrono::steady_clock::now() + kTimeout;
@@ -121,8 +138,14 @@ void ServerProcess::waitUntilIdle() const {
   }
 }
 
+std::size_t ServerProcess::statusBytes(std::string_view label) const {
+  const auto kibibytes = numberAfter(textOfFile("/proc/" + std::to_string(process_) + "/status"), label);
+  if (!kibibytes) failWithOutput("the server has ended");
+  return static_cast<std::size_t>(*kibibytes) * 1024;
+}
+
 void ServerProcess::failWithOutput(const std::string& what) const {
-  throw std::runtime_error(what + ". It said:\n" + textOfFile(directory_ + "/output"));
+  throw std::runtime_error(what + ". It said:\n" + output());
 }
 
 bool ServerProcess::hasEnded() {

@@ -3,8 +3,10 @@
 
 #include <chrono>
 #include <cstddef>
+#include <cstdint>
 #include <map>
 #include <string>
+#include <string_view>
 #include <sys/types.h>
 #include <vector>
 
@@ -16,6 +18,8 @@ namespace tonewerk {
 // directory.
 class ServerProcess {
  public:
+  static constexpr const char* kSocket = "reporting.sock";
+
   using Processor = std::chrono::nanoseconds;
 
   // Makes an empty directory for a server.
@@ -25,10 +29,12 @@ class ServerProcess {
   ~ServerProcess();
 
   const std::string& directory() const { return directory_; }
-  std::string socketPath() const { return directory_ + "/reporting.sock"; }
+  std::string socketPath() const { return directory_ + "/" + kSocket; }
 
-  // Starts the server with directory() as all of its directories, and waits until it listens at socketPath().
-  void start(const std::string& program, const std::vector<std::string>& arguments);
+  // Starts the server with directory() as all of its directories, and waits until it listens at socketPath(),
+  // or at `socket` in the directory.
+  void start(const std::string& program, const std::vector<std::string>& arguments,
+             const std::string& socket = kSocket);
 
   // Processor time of all its threads, in user and kernel mode.
   Processor processorTime() const;
@@ -36,11 +42,18 @@ class ServerProcess {
   std::map<std::string, Processor> processorTimeByThread() const;
   // Largest resident memory so far, in bytes.
   std::size_t peakMemory() const;
+  // Resident memory now, in bytes.
+  std::size_t residentMemory() const;
+  // How often each of its threads has waited so far, by the thread's number. Each wait ends with a wake-up.
+  std::map<std::string, std::uint64_t> waitsByThread() const;
+  // What the server has written to its standard output and standard error.
+  std::string output() const;
 
   // Waits until the server is idle: queued work is done, and the store's last batch is written.
   void waitUntilIdle() const;
 
  private:
+  std::size_t statusBytes(std::string_view label) const;
   [[noreturn]] void failWithOutput(const std::string& what) const;
   bool hasEnded();
   void stop();
