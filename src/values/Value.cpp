@@ -3,100 +3,19 @@
 
 #include <charconv>
 #include <cmath>
-#include <cstdlib>
 #include <limits>
 #include <optional>
 #include <type_traits>
 
 #include "values/CompactJson.h"
+#include "values/Conversions.h"
+#include "values/Decimal.h"
 
 namespace tonewerk {
 namespace {
 
 constexpr double kTwoTo63 = 9223372036854775808.0;
 constexpr double kTwoTo64 = 18446744073709551616.0;
-
-bool isDigit(char c) { return c >= '0' && c <= '9'; }
-bool isSpace(char c) { return c == ' ' || (c >= '\t' && c <= '\r'); }
-
-std::int64_t saturated(double number) {
-  if (std::isnan(number)) return 0;
-  if (number >= kTwoTo63) return std::numeric_limits<std::int64_t>::max();
-  if (number < -kTwoTo63) return std::numeric_limits<std::int64_t>::min();
-  return static_cast<std::int64_t>(number);
-}
-
-// The characters at the start of a text that form a decimal number: sign, digits, fraction, exponent.
-struct LeadingNumber {
-  std::string_view text;  // without leading spaces and plus sign; empty when there is no digit
-  bool isWhole = true;    // has neither a fraction nor an exponent
-};
-
-LeadingNumber leadingNumber(std::string_view text) {
-  std::size_t at = 0;
-  while (at < text.size() && isSpace(text[at])) ++at;
-  std::size_t start = at;
-  if (at < text.size() && (text[at] == '+' || text[at] == '-')) {
-    if (text[at++] == '+') ++start;
-  }
-  const auto digits = [&] {
-    const std::size_t from = at;
-    while (at < text.size() && isDigit(text[at])) ++at;
-    return at - from;
-  };
-  LeadingNumber number;
-  std::size_t count = digits();
-  if (at < text.size() && text[at] == '.') {
-    const std::size_t point = at++;
-    const std::size_t fraction = digits();
-    number.isWhole = false;
-    if (count + fraction == 0) at = point;
-    count += fraction;
-  }
-  if (count == 0) return {};
-  if (at < text.size() && (text[at] == 'e' || text[at] == 'E')) {
-    const std::size_t exponent = at++;
-    if (at < text.size() && (text[at] == '+' || text[at] == '-')) ++at;
-    if (digits() == 0) {
-      at = exponent;
-    } else {
-      number.isWhole = false;
-    }
-  }
-  number.text = text.substr(start, at - start);
-  return number;
-}
-
-double doubleOf(std::string_view digits) {
-  double result = 0.0;
-  const auto parsed = std::from_chars(digits.data(), digits.data() + digits.size(), result);
-  if (parsed.ec != std::errc::result_out_of_range) return result;
-  // The number is too large or too small for a double. from_chars does not say which; strtod does.
-  return std::strtod(std::string(digits).c_str(), nullptr);
-}
-
-double numberOfText(std::string_view text) {
-  const LeadingNumber number = leadingNumber(text);
-  return number.text.empty() ? 0.0 : doubleOf(number.text);
-}
-
-std::int64_t integerOfText(std::string_view text) {
-  const LeadingNumber number = leadingNumber(text);
-  if (number.text.empty()) return 0;
-  if (!number.isWhole) return saturated(doubleOf(number.text));
-  std::int64_t result = 0;
-  const auto parsed = std::from_chars(number.text.data(), number.text.data() + number.text.size(), result);
-  if (parsed.ec == std::errc()) return result;
-  return number.text.front() == '-' ? std::numeric_limits<std::int64_t>::min()
-                                    : std::numeric_limits<std::int64_t>::max();
-}
-
-bool booleanOfText(std::string_view text) {
-  if (text.empty()) return false;
-  const char first = text.front();
-  if (first == 'Y' || first == 'y' || first == 'T' || first == 't') return true;
-  return numberOfText(text) != 0.0;
-}
 
 bool sameNumber(std::int64_t a, std::uint64_t b) { return a >= 0 && static_cast<std::uint64_t>(a) == b; }
 bool sameNumber(std::int64_t a, double b) {
@@ -174,11 +93,11 @@ std::int64_t Value::integer() const {
                                                               : static_cast<std::int64_t>(*asUnsigned());
     }
     case Kind::kDouble:
-      return saturated(*asDouble());
+      return saturatedInteger(*asDouble());
     case Kind::kString:
       return integerOfText(*asString());
     case Kind::kDate:
-      return saturated(asDate()->seconds);
+      return saturatedInteger(asDate()->seconds);
     case Kind::kArray:
     case Kind::kMap:
       return 0;
@@ -269,13 +188,8 @@ bool operator==(const Value& a, const Value& b) {
 std::string textOf(double value) {
   if (std::isnan(value)) return "nan";
   if (std::isinf(value)) return value < 0 ? "-inf" : "inf";
-  const double size = std::fabs(value);
-  const bool fixed = size == 0.0 || (size >= 1e-4 && size < 1e16);
-  char digits[32];
-  const auto end = std::to_chars(digits, digits + sizeof(digits), value,
-                                 fixed ? std::chars_format::fixed : std::chars_format::scientific)
-                       .ptr;
-  return {digits, end};
+  char digits[kMaxDigits];
+  return {digits, digitsOf(value, digits)};
 }
 
 std::string textOf(const Value* value) { return value == nullptr ? "(null)" : value->text(); }
