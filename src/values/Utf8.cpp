@@ -68,6 +68,10 @@ std::size_t validBytes(std::string_view text, Noncharacters noncharacters) {
         continue;
       }
     }
+    if (byteAt(text, at) < 0x80) {
+      ++at;
+      continue;
+    }
     const std::size_t length = utf8CharacterLength(text.substr(at));
     if (length == 0) break;
     if (noncharacters == Noncharacters::kRefused && isNoncharacter(text.substr(at, length))) break;

@@ -2,10 +2,29 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <string>
 #include <string_view>
 
+#include "values/Bytes.h"
+
 namespace tonewerk {
+
+// Returns whether `text` has only characters up to U+007F, as nearly all text. Quick for short texts.
+inline bool isAscii(std::string_view text) {
+  const char* at = text.data();
+  std::uint64_t seen = 0;
+  if (text.size() >= sizeof(std::uint64_t)) {
+    const char* const last = at + text.size() - sizeof(std::uint64_t);
+    for (; at < last; at += sizeof(std::uint64_t)) seen |= loadAt<std::uint64_t>(at);
+    seen |= loadAt<std::uint64_t>(last);
+  } else if (text.size() >= sizeof(std::uint32_t)) {
+    seen = loadAt<std::uint32_t>(at) | loadAt<std::uint32_t>(at + text.size() - sizeof(std::uint32_t));
+  } else {
+    for (const char c : text) seen |= static_cast<unsigned char>(c);
+  }
+  return (seen & 0x8080808080808080U) == 0;
+}
 
 // Returns the length in bytes of the character at the start of `text`, which must not be empty; 0 when no
 // well-formed character is there.
