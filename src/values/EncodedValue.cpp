@@ -1,0 +1,332 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "values/EncodedValue.h"
+
+#include <bit>
+#include <cassert>
+#include <limits>
+#include <utility>
+#include <vector>
+
+namespace tonewerk {
+namespace encoding {
+namespace {
+
+constexpr std::uint64_t kNanosecondsPerSecond = 1'000'000'000;
+constexpr unsigned kSecondsBits = 34;  // of the form with 8 bytes; nanoseconds have the other 30
+
+std::optional<Date> dateOf(std::int64_t seconds, std::uint64_t nanoseconds) {
+  if (nanoseconds >= kNanosecondsPerSecond) return std::nullopt;
+  return Date{static_cast<double>(seconds) + static_cast<double>(nanoseconds) / 1e9};
+}
+
+}  // namespace
+
+std::optional<Date> dateOf(std::string_view body) {
+  switch (body.size()) {
+    case 4:
+      return dateOf(std::int64_t{bigEndianAt<std::uint32_t>(body.data())}, 0);
+    case 8: {
+      const auto both = bigEndianAt<std::uint64_t>(body.data());
+      const std::uint64_t seconds = both & ((std::uint64_t{1} << kSecondsBits) - 1);
+      return dateOf(static_cast<std::int64_t>(seconds), both >> kSecondsBits);
+    }
+    case 12:
+      return dateOf(static_cast<std::int64_t>(bigEndianAt<std::uint64_t>(body.data() + 4)),
+                    bigEndianAt<std::uint32_t>(body.data()));
+    default:
+      return std::nullopt;
+  }
+}
+
+std::size_t headerLength(std::uint8_t first) {
+  switch (first) {
+    case kBinary8:
+    case kText8:
+    case kExtensionOf1:
+    case kExtensionOf2:
+    case kExtensionOf4:
+    case kExtensionOf8:
+    case kExtensionOf16:
+      return 2;
+    case kBinary16:
+    case kText16:
+    case kArray16:
+    case kMap16:
+    case kExtension8:
+      return 3;
+    case kExtension16:
+      return 4;
+    case kBinary32:
+    case kText32:
+    case kArray32:
+    case kMap32:
+      return 5;
+    case kExtension32:
+      return 6;
+    default:
+      return 1;
+  }
+}
+
+Extent extentAt(const char* at) {
+  const std::uint8_t first = byteAt(at);
+  const std::size_t header = headerLength(first);
+  switch (first) {
+    case kBinary8:
+    case kText8:
+    case kExtension8:
+      return {header, bigEndianAt<std::uint8_t>(at + 1)};
+    case kBinary16:
+    case kText16:
+    case kArray16:
+    case kMap16:
+    case kExtension16:
+      return {header, bigEndianAt<std::uint16_t>(at + 1)};
+    case kBinary32:
+    case kText32:
+    case kArray32:
+    case kMap32:
+    case kExtension32:
+      return {header, bigEndianAt<std::uint32_t>(at + 1)};
+    case kExtensionOf1:
+    case kExtensionOf2:
+    case kExtensionOf4:
+    case kExtensionOf8:
+    case kExtensionOf16:
+      return {header, std::size_t{1} << (first - kExtensionOf1)};
+    default:
+      return {header, first & (first >= kFixedText ? 0x1FU : 0x0FU)};
+  }
+}
+
+Scanned scan(std::string_view bytes, std::size_t levels) {
+  assert(levels <= kMaxLevels);
+  std::array<std::size_t, kMaxLevels> open{};  // values that are still missing, of each array and map
+  std::size_t depth = 0;
+  std::size_t at = 0;
+  for (;;) {
+    if (at == bytes.size()) return {Scan::kIncomplete, 0};
+    const std::uint8_t first = byteAt(bytes.data() + at);
+    if (first == kReserved) return {Scan::kInvalid, 0};
+    std::size_t length = kFixedLengths[first];
+    if (length == 0) {
+      const std::size_t left = bytes.size() - at;
+      if (headerLength(first) > left) return {Scan::kIncomplete, 0};
+      const Extent extent = extentAt(bytes.data() + at);
+      length = extent.header;
+      if (isArray(first) || isMap(first)) {
+        if (depth == levels) return {Scan::kTooDeep, 0};
+        const std::size_t values = isMap(first) ? 2 * extent.count : extent.count;
+        if (values > 0) {
+          at += length;
+          open[depth++] = values;
+          continue;
+        }
+      } else {
+        length += extent.count;
+      }
+    }
+    if (length > bytes.size() - at) return {Scan::kIncomplete, 0};
+    at += length;
+    while (depth > 0 && --open[depth - 1] == 0) --depth;
+    if (depth == 0) return {Scan::kValue, at};
+  }
+}
+
+}  // namespace encoding
+
+namespace {
+
+using namespace encoding;
+
+Value dateAt(const char* at) {
+  const Extent extent = extentAt(at);
+  const std::optional<Date> date = encoding::dateOf({at + extent.header, extent.count});
+  assert(date);
+  return date.value_or(Date{});
+}
+
+Value arrayOf(EncodedValue array) {
+  std::vector<Value> values;
+  values.reserve(extentAt(array.begin()).count);
+  forEachElement(array, [&](EncodedValue element) { values.push_back(element.value()); });
+  return ValueArray(std::move(values));
+}
+
+Value mapOf(EncodedValue map) {
+  ValueMap values;
+  values.reserve(extentAt(map.begin()).count);
+  forEachEntry(map, [&](std::string_view key, EncodedValue value) { values.add(key, value.value()); });
+  return values;
+}
+
+EncodedValue find(EncodedValue map, std::string_view wanted) {
+  EncodedValue found;
+  forEachEntry(map, [&](std::string_view key, EncodedValue value) {
+    if (key == wanted) found = value;
+  });
+  return found;
+}
+
+bool equalArrays(EncodedValue a, EncodedValue b) {
+  const Extent extent = extentAt(b.begin());
+  if (extentAt(a.begin()).count != extent.count) return false;
+  const char* other = b.begin() + extent.header;
+  bool isEqual = true;
+  forEachElement(a, [&](EncodedValue element) {
+    if (!isEqual) return;
+    isEqual = element == EncodedValue(other);
+    other = EncodedValue(other).end();
+  });
+  return isEqual;
+}
+
+// The keys of each map differ, so maps of one size have the same keys when one has those of the other.
+bool equalMaps(EncodedValue a, EncodedValue b) {
+  if (extentAt(a.begin()).count != extentAt(b.begin()).count) return false;
+  bool isEqual = true;
+  forEachEntry(a, [&](std::string_view key, EncodedValue value) {
+    if (!isEqual) return;
+    const EncodedValue other = find(b, key);
+    isEqual = other && other == value;
+  });
+  return isEqual;
+}
+
+void appendBigEndian(std::string& out, Byte first, std::uint64_t number, std::size_t bytes) {
+  out += static_cast<char>(first);
+  for (std::size_t left = bytes; left > 0; --left)
+    out += static_cast<char>(number >> (8 * (left - 1)) & 0xFFU);
+}
+
+void appendUnsigned(std::string& out, std::uint64_t number) {
+  if (number < kFixedMap) {
+    out += static_cast<char>(number);
+  } else if (number <= std::numeric_limits<std::uint8_t>::max()) {
+    appendBigEndian(out, kUnsigned8, number, 1);
+  } else if (number <= std::numeric_limits<std::uint16_t>::max()) {
+    appendBigEndian(out, kUnsigned16, number, 2);
+  } else if (number <= std::numeric_limits<std::uint32_t>::max()) {
+    appendBigEndian(out, kUnsigned32, number, 4);
+  } else {
+    appendBigEndian(out, kUnsigned64, number, 8);
+  }
+}
+
+void appendInteger(std::string& out, std::int64_t number) {
+  const auto bits = static_cast<std::uint64_t>(number);
+  if (number >= 0) {
+    appendUnsigned(out, bits);
+  } else if (number >= -32) {
+    out += static_cast<char>(number);
+  } else if (number >= std::numeric_limits<std::int8_t>::min()) {
+    appendBigEndian(out, kSigned8, bits, 1);
+  } else if (number >= std::numeric_limits<std::int16_t>::min()) {
+    appendBigEndian(out, kSigned16, bits, 2);
+  } else if (number >= std::numeric_limits<std::int32_t>::min()) {
+    appendBigEndian(out, kSigned32, bits, 4);
+  } else {
+    appendBigEndian(out, kSigned64, bits, 8);
+  }
+}
+
+void appendText(std::string& out, std::string_view text) {
+  if (text.size() < 32) {
+    out += static_cast<char>(kFixedText + text.size());
+  } else if (text.size() <= std::numeric_limits<std::uint8_t>::max()) {
+    appendBigEndian(out, kText8, text.size(), 1);
+  } else if (text.size() <= std::numeric_limits<std::uint16_t>::max()) {
+    appendBigEndian(out, kText16, text.size(), 2);
+  } else {
+    appendBigEndian(out, kText32, text.size(), 4);
+  }
+  out += text;
+}
+
+}  // namespace
+
+const char* EncodedValue::endOfLong() const {
+  const char* at = at_;
+  for (std::size_t left = 1; left > 0; --left) {
+    const std::uint8_t byte = byteAt(at);
+    if (const std::size_t length = kFixedLengths[byte]) {
+      at += length;
+      continue;
+    }
+    const Extent extent = extentAt(at);
+    at += extent.header;
+    if (isArray(byte)) {
+      left += extent.count;
+    } else if (isMap(byte)) {
+      left += 2 * extent.count;
+    } else {
+      at += extent.count;
+    }
+  }
+  return at;
+}
+
+Value::Kind EncodedValue::kind() const {
+  const std::uint8_t byte = first();
+  if (encoding::isText(byte)) return Value::Kind::kString;
+  if (isExtension(byte)) return Value::Kind::kDate;
+  if (isArray(byte)) return Value::Kind::kArray;
+  if (isMap(byte)) return Value::Kind::kMap;
+  return scalar().kind();
+}
+
+Value EncodedValue::scalar() const {
+  const std::uint8_t byte = first();
+  if (isExtension(byte)) return dateAt(at_);
+  if (isArray(byte)) return ValueArray();
+  if (isMap(byte)) return ValueMap();
+  return visitNumber(at_, [](auto number) { return Value(number); });
+}
+
+Value EncodedValue::value() const {
+  const std::uint8_t byte = first();
+  if (encoding::isText(byte)) return text();
+  if (isArray(byte)) return arrayOf(*this);
+  if (isMap(byte)) return mapOf(*this);
+  return scalar();
+}
+
+bool operator==(EncodedValue a, EncodedValue b) {
+  if (a.isText() || b.isText()) return a.isText() && b.isText() && a.text() == b.text();
+  if (a.isNumber() && a.first() == b.first() && a.first() != kFloat32 && a.first() != kFloat64)
+    return a.bytes() == b.bytes();  // integers of one form
+  const Value::Kind kind = a.kind();
+  if (kind == Value::Kind::kArray || kind == Value::Kind::kMap) {
+    if (b.kind() != kind) return false;
+    return kind == Value::Kind::kArray ? equalArrays(a, b) : equalMaps(a, b);
+  }
+  const Value::Kind other = b.kind();
+  return other != Value::Kind::kArray && other != Value::Kind::kMap && a.scalar() == b.scalar();
+}
+
+bool appendEncoded(std::string& out, const Value& value) {
+  switch (value.kind()) {
+    case Value::Kind::kBoolean:
+      out += static_cast<char>(*value.asBoolean() ? kTrue : kFalse);
+      return true;
+    case Value::Kind::kInteger:
+      appendInteger(out, *value.asInteger());
+      return true;
+    case Value::Kind::kUnsigned:
+      appendUnsigned(out, *value.asUnsigned());
+      return true;
+    case Value::Kind::kDouble:
+      appendBigEndian(out, kFloat64, std::bit_cast<std::uint64_t>(*value.asDouble()), 8);
+      return true;
+    case Value::Kind::kString:
+      appendText(out, *value.asString());
+      return true;
+    case Value::Kind::kDate:
+    case Value::Kind::kArray:
+    case Value::Kind::kMap:
+      break;
+  }
+  return false;
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,148 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <span>
+#include <string_view>
+#include <vector>
+
+#include "values/Shape.h"
+#include "values/SharedString.h"
+#include "values/Value.h"
+
+namespace tonewerk {
+
+// Finds the shape of a sequence of keys, and makes it when it is new: equal sequences have one shape.
+//
+// The sequences form a tree from key to key, in which a reader of a message walks down:
+//
+//   root() -- next("time") -- next("level") -- shapeAt()  {"time": ..., "level": ...}
+//                                           -- next("device") -- shapeAt()
+//
+// A walk expects the key that came next last time, so for a repeated message each key costs one comparison;
+// any other costs a hash probe, however many keys may follow.
+//
+// It never grows beyond its limits and forgets nothing: at a limit it answers "none" to what is new, and
+// still finds the rest. So make one for each client. One thread; its shapes may live longer, and on any
+// thread.
+class ShapeTable {
+ public:
+  static constexpr std::size_t kMaxShapes = 1024;
+  // The most keys of all sequences together, where a common beginning counts once, and of one sequence.
+  static constexpr std::size_t kMaxKeys = 8192;
+  static constexpr std::size_t kMaxKeysOfShape = 1024;
+  // The most bytes of all keys and shapes together.
+  static constexpr std::size_t kMaxBytes = std::size_t{1} << 20U;
+
+  // A place in the tree: the keys on the way to it are the beginning of a sequence.
+  enum class Place : std::uint32_t {};
+
+  // The shapes know the slots of the keys `known`, at most Shape::kMaxKnownKeys.
+  explicit ShapeTable(std::vector<SharedString> known = {});
+  ShapeTable(const ShapeTable&) = delete;
+  ShapeTable& operator=(const ShapeTable&) = delete;
+
+  static constexpr Place root() { return Place{0}; }
+  static constexpr Place none() { return Place{static_cast<std::uint32_t>(-1)}; }
+
+  // Returns the place after `key`, or none() when it is new.
+  Place find(Place from, std::string_view key) {
+    const std::uint32_t guess = at(from).guess;
+    if (guess != 0) {
+      const std::string_view text = nodes_[guess].text;
+      if (text.size() == key.size() && sameBytes(text.data(), key.data(), key.size())) return Place{guess};
+    }
+    return probe(from, key);
+  }
+  // Adds a key that is new. Returns none() at a limit.
+  Place add(Place from, std::string_view key);
+  // Finds or adds.
+  Place next(Place from, std::string_view key) {
+    const Place found = find(from, key);
+    return found == none() ? add(from, key) : found;
+  }
+
+  // Returns the shape of the keys on the way to `place`; null at a limit. The table keeps it.
+  const Shape* shapeAt(Place place) {
+    const Shape* shape = at(place).shape.get();
+    return shape != nullptr ? shape : makeShape(place);
+  }
+
+  // Returns the shape of messages of `shape` with one more key; null at a limit, and for shapes with
+  // constants or of other tables.
+  const Shape* appended(const Shape& shape, std::string_view key);
+
+  // Returns shape.extended(constants), the same shape for the same values; null at a limit, for shapes of
+  // other tables, and for values that cannot be constants.
+  const Shape* extended(const Shape& shape, std::span<const ValueMapEntry> constants);
+  const Shape* extended(const Shape& shape, std::initializer_list<ValueMapEntry> constants) {
+    return extended(shape, std::span(constants.begin(), constants.size()));
+  }
+
+  std::size_t shapes() const { return shapes_.size(); }
+  std::size_t keys() const { return nodes_.size() - 1; }
+  std::size_t bytes() const { return bytes_; }
+
+ private:
+  static constexpr std::uint32_t kNoNode = static_cast<std::uint32_t>(-1);
+
+  struct Node {
+    std::string_view text;    // of `key`
+    std::uint32_t guess = 0;  // the node that a walk from here went to last; 0 for none
+    std::uint32_t parent = 0;
+    std::uint32_t depth = 0;
+    SharedString key;
+    Counted<const Shape> shape;  // null until a sequence has ended here
+  };
+
+  // What the table remembers of a shape.
+  struct Interned {
+    Counted<const Shape> shape;
+    std::uint32_t node = kNoNode;          // of a shape that is made of keys
+    std::uint32_t guess = 0;               // number of the extended shape that was asked for last; 0 for none
+    std::vector<ValueMapEntry> constants;  // of an extended one
+  };
+
+  // A hash table of numbers with linear probing; 0 stands for an empty slot.
+  class Index {
+   public:
+    // Returns the first number with this hash for which isWanted() is true, or 0.
+    template <typename IsWanted>
+    std::uint32_t find(std::size_t hash, IsWanted&& isWanted) const;
+    void add(std::size_t hash, std::uint32_t number);
+
+   private:
+    struct Entry {
+      std::size_t hash = 0;
+      std::uint32_t number = 0;
+    };
+    void insert(Entry entry);
+
+    std::vector<Entry> entries_ = std::vector<Entry>(64);
+    std::size_t used_ = 0;
+  };
+
+  Node& at(Place place) { return nodes_[static_cast<std::size_t>(place)]; }
+  Place probe(Place from, std::string_view key);
+  const Shape* makeShape(Place place);
+  const Shape* makeExtended(const Shape& shape, std::span<const ValueMapEntry> constants, std::size_t hash);
+  // Where the next new shape is interned.
+  Shape::Origin nextOrigin() const { return {identifier_, static_cast<std::uint32_t>(shapes_.size() + 1)}; }
+  const Shape* intern(Interned interned);
+  // None for a shape of another table.
+  Interned* internedOf(const Shape& shape) {
+    return shape.origin().table == identifier_ ? &shapes_[shape.origin().number - 1] : nullptr;
+  }
+
+  const std::uint64_t identifier_;
+  const std::vector<SharedString> known_;
+  std::vector<Node> nodes_;
+  Index nodesByKey_;
+  std::vector<Interned> shapes_;  // in the order of their numbers, from 1
+  Index extensions_;
+  std::size_t bytes_ = 0;
+  bool isFull_ = false;  // a shape was refused; no further one is made, because making it only to see is slow
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,121 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "values/EncodedValue.h"
+
+#include <cstdint>
+#include <gtest/gtest.h>
+#include <limits>
+#include <string>
+#include <string_view>
+
+#include "values/Value.h"
+
+namespace tonewerk {
+namespace {
+
+using encoding::Scan;
+using encoding::scan;
+
+std::string encoded(const Value& value) {
+  std::string bytes;
+  EXPECT_TRUE(appendEncoded(bytes, value));
+  return bytes;
+}
+
+Scan scanned(std::string_view bytes, std::size_t levels = encoding::kMaxLevels) {
+  return scan(bytes, levels).scan;
+}
+
+TEST(EncodedValueTest, ReadsWhatWasEncodedInTheShortestForm) {
+  constexpr auto kMax = std::numeric_limits<std::uint64_t>::max();
+  const std::pair<Value, std::size_t> kLengths[] = {{true, 1},
+                                                    {0, 1},
+                                                    {127, 1},
+                                                    {128, 2},
+                                                    {255, 2},
+                                                    {256, 3},
+                                                    {65535, 3},
+                                                    {65536, 5},
+                                                    {1LL << 32, 9},
+                                                    {kMax, 9},
+                                                    {-1, 1},
+                                                    {-32, 1},
+                                                    {-33, 2},
+                                                    {-128, 2},
+                                                    {-129, 3},
+                                                    {-32768, 3},
+                                                    {-32769, 5},
+                                                    {INT64_MIN, 9},
+                                                    {2.0, 9},
+                                                    {"", 1},
+                                                    {std::string(31, 'x'), 32},
+                                                    {std::string(32, 'x'), 34},
+                                                    {std::string(255, 'x'), 257},
+                                                    {std::string(256, 'x'), 259},
+                                                    {std::string(65536, 'x'), 65541}};
+  for (const auto& [value, length] : kLengths) {
+    const std::string bytes = encoded(value);
+    EXPECT_EQ(bytes.size(), length) << value.text().substr(0, 40);
+    EXPECT_EQ(EncodedValue(bytes.data()).value(), value) << value.text().substr(0, 40);
+    EXPECT_EQ(EncodedValue(bytes.data()).kind(), value.kind());
+    EXPECT_EQ(EncodedValue(bytes.data()).bytes().size(), length);
+    EXPECT_EQ(scan(bytes + "x", 0).length, length);
+  }
+}
+
+TEST(EncodedValueTest, EncodesNothingThatHasNoExactForm) {
+  std::string bytes;
+  for (const Value& value : {Value(Date{0.1}), Value(ValueArray{}), Value(ValueMap{})}) {
+    EXPECT_FALSE(appendEncoded(bytes, value));
+    EXPECT_EQ(bytes, "");
+  }
+}
+
+TEST(EncodedValueTest, ScansWholeValuesOnly) {
+  using namespace std::literals;
+  for (const std::string_view bytes :
+       {"\xC0"sv, "\x01"sv, "\xA2xy"sv, "\xD9\x02xy"sv, "\xDA\0\x01x"sv, "\xDB\0\0\0\x01x"sv, "\xC4\x01x"sv,
+        "\xC7\x01\x05x"sv, "\xC8\0\x01\x05x"sv, "\xC9\0\0\0\x01\x05x"sv, "\xD4\x05x"sv,
+        "\xD8\x05"
+        "0123456789abcdef"sv,
+        "\x92\x01\x02"sv,
+        "\x82\xA1"
+        "a\x01\xA1"
+        "b\x90"sv,
+        "\xDC\0\x01\x80"sv, "\xDF\0\0\0\x01\x01\x01"sv, "\xCB\0\0\0\0\0\0\0\0"sv}) {
+    EXPECT_EQ(scanned(bytes), Scan::kValue);
+    EXPECT_EQ(scan(bytes, encoding::kMaxLevels).length, bytes.size());
+    for (std::size_t size = 0; size < bytes.size(); ++size)
+      EXPECT_EQ(scanned(bytes.substr(0, size)), Scan::kIncomplete) << size;
+  }
+}
+
+TEST(EncodedValueTest, ScansNoReservedByte) {
+  EXPECT_EQ(scanned("\xC1"), Scan::kInvalid);
+  EXPECT_EQ(scanned("\x92\x01\xC1"), Scan::kInvalid);
+}
+
+TEST(EncodedValueTest, ScansNoDeeperThanAsked) {
+  EXPECT_EQ(scanned("\x91\x91\x01", 2), Scan::kValue);
+  EXPECT_EQ(scanned("\x91\x91\x01", 1), Scan::kTooDeep);
+  EXPECT_EQ(scanned("\x91\x90", 1), Scan::kTooDeep);
+  EXPECT_EQ(scanned("\x01", 0), Scan::kValue);
+  EXPECT_EQ(scanned("\x90", 0), Scan::kTooDeep);
+}
+
+TEST(EncodedValueTest, AHugeCountCostsNothing) {
+  EXPECT_EQ(scanned("\xDD\xFF\xFF\xFF\xFF\x01"), Scan::kIncomplete);
+  EXPECT_EQ(scanned("\xDF\xFF\xFF\xFF\xFF\x01"), Scan::kIncomplete);
+  EXPECT_EQ(scanned("\xC9\xFF\xFF\xFF\xFF\x01"), Scan::kIncomplete);
+}
+
+TEST(EncodedValueTest, ReadsTheThreeFormsOfADate) {
+  using namespace std::literals;
+  EXPECT_EQ(encoding::dateOf("\0\0\0\x05"sv), Date{5});
+  EXPECT_EQ(encoding::dateOf("\0\0\0\0\xFF\xFF\xFF\xFF"sv), Date{4294967295.0});
+  EXPECT_EQ(encoding::dateOf("\x1D\xCD\x65\0\xFF\xFF\xFF\xFF\xFF\xFF\xFF\xFE"sv), Date{-1.5});
+  EXPECT_FALSE(encoding::dateOf("\0\0\0"sv));
+  EXPECT_FALSE(encoding::dateOf("\xFF\xFF\xFF\xFF\0\0\0\0"sv));
+}
+
+}  // namespace
+}  // namespace tonewerk
