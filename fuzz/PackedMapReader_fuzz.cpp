@@ -1,0 +1,75 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Reads the input as a client's map, twice: as the argument of a request, and into a packed map. Both must
+// accept or refuse it in the same words, and must be the same map.
+#include <cstddef>
+#include <cstdint>
+#include <cstdlib>
+#include <string>
+#include <string_view>
+
+#include "platform/linux/messagepack/PackedMapReader.h"
+#include "platform/linux/messagepack/RpcFrameReader.h"
+#include "platform/linux/messagepack/RpcLimits.h"
+#include "values/EncodedValue.h"
+#include "values/ValueView.h"
+
+namespace tonewerk {
+namespace {
+
+void expect(bool condition) {
+  if (!condition) std::abort();
+}
+
+void expectSame(const ValueMap& packed, const ValueMap& plain) {
+  expect(packed == plain);
+  expect(plain == packed);
+  expect(packed.text() == plain.text());
+  const ValueMapEntry* next = plain.begin();
+  packed.forEach([&](const SharedString& key, ValueView value) {
+    expect(key == next->key);
+    expect(value.kind() == next->value.kind());
+    expect(value == ValueView(next->value));
+    expect(value.text() == next->value.text());
+    ++next;
+  });
+  ValueMap changed = packed;
+  changed.set("key", 1);
+  ValueMap changedPlain = plain;
+  changedPlain.set("key", 1);
+  expect(changed.text() == changedPlain.text());
+}
+
+void read(std::string_view bytes) {
+  constexpr std::size_t kFrameAndArguments = 2;
+  const encoding::Scanned scanned = encoding::scan(bytes, kMaxFrameDepth - kFrameAndArguments);
+  ShapeTable shapes;
+  PackedMapReader packedReader(shapes);
+  const PackedMapReader::Read read = packedReader.read(bytes);
+
+  const std::string frame = std::string("\x94\x00\x01\xA1m\x91", 6).append(bytes);
+  RpcStrings texts;
+  RpcFrameReader reader(texts);
+  std::string_view rest = frame;
+  const RpcFrameReader::Result result = reader.next(rest);
+  const bool isWhole = scanned.scan == encoding::Scan::kValue;
+  if (isWhole && frame.size() <= kMaxFrameBytes) expect(result == RpcFrameReader::Result::kFrame);
+  if (!isWhole) expect(result != RpcFrameReader::Result::kFrame);
+  if (!isWhole || scanned.length != bytes.size()) {
+    expect(read.result != PackedMapReader::Result::kPacked);
+    return;
+  }
+  if (read.result == PackedMapReader::Result::kTree || result != RpcFrameReader::Result::kFrame) return;
+  const RpcFrame& plain = reader.frame();
+  expect(plain.refused.has_value() == (read.result == PackedMapReader::Result::kRefused));
+  if (plain.refused) return expect(std::string_view(plain.refused->what) == read.refused);
+  expectSame(read.map, *plain.arguments.front()->asMap());
+}
+
+}  // namespace
+}  // namespace tonewerk
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+  tonewerk::read({reinterpret_cast<const char*>(data), size});
+  return 0;
+}

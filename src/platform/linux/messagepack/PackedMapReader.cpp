@@ -1,0 +1,212 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/messagepack/PackedMapReader.h"
+
+#include <array>
+#include <cstdint>
+#include <cstring>
+#include <optional>
+#include <utility>
+
+#include "platform/linux/messagepack/RpcLimits.h"
+#include "platform/linux/messagepack/RpcTimestamp.h"
+#include "values/Bytes.h"
+#include "values/EncodedValue.h"
+#include "values/Utf8.h"
+
+namespace tonewerk {
+namespace {
+
+using encoding::byteAt;
+
+// The room for values that is kept from one map to the next.
+constexpr std::size_t kKeptBytes = std::size_t{64} * 1024;
+// How far copyValue() may write behind a value.
+constexpr std::size_t kOvershoot = 16;
+// The frame's own array and that of the arguments are around every argument.
+constexpr std::size_t kArgumentLevels = kMaxFrameDepth - 2;
+
+// Checks values, one after the other. After the first problem it stands still.
+class Checker {
+ public:
+  explicit Checker(std::string_view bytes) : at_(bytes.data()), end_(bytes.data() + bytes.size()) {}
+
+  const char* at() const { return at_; }
+  bool isAtEnd() const { return at_ == end_; }
+  // The word for a value that the protocol does not allow; null when there was none.
+  const char* refused() const { return refused_; }
+
+  // Read the start of a map and of an array. None after a problem.
+  std::optional<std::size_t> count();
+  // Returns the next key without a check of its characters. None when it is no text, and after a problem.
+  std::optional<std::string_view> key();
+  // Checks that a key's characters are allowed.
+  bool isValidKey(std::string_view key);
+  // Goes behind the next value, which may hold this many levels of arrays and maps. False after a problem.
+  bool value(std::size_t levels);
+
+ private:
+  std::size_t left() const { return static_cast<std::size_t>(end_ - at_); }
+  bool refuse(const char* what) {
+    refused_ = what;
+    return false;
+  }
+  // Returns the body of a text or an extension, and goes behind it.
+  std::optional<std::string_view> body();
+  // The same for a text, most of which are short.
+  std::optional<std::string_view> textBody();
+  bool text();
+  bool extension();
+  bool array(std::size_t levels);
+  bool map(std::size_t levels);
+
+  const char* at_;
+  const char* const end_;
+  const char* refused_ = nullptr;
+};
+
+std::optional<std::size_t> Checker::count() {
+  if (isAtEnd() || encoding::headerLength(byteAt(at_)) > left()) return std::nullopt;
+  const encoding::Extent extent = encoding::extentAt(at_);
+  at_ += extent.header;
+  return extent.count;
+}
+
+std::optional<std::string_view> Checker::body() {
+  if (isAtEnd() || encoding::headerLength(byteAt(at_)) > left()) return std::nullopt;
+  const encoding::Extent extent = encoding::extentAt(at_);
+  if (extent.count > left() - extent.header) return std::nullopt;
+  const std::string_view body(at_ + extent.header, extent.count);
+  at_ += extent.header + extent.count;
+  return body;
+}
+
+std::optional<std::string_view> Checker::textBody() {
+  const std::uint8_t first = byteAt(at_);
+  if ((first & 0xE0U) != encoding::kFixedText) return body();
+  const std::size_t size = first & 0x1FU;
+  if (size >= left()) return std::nullopt;
+  const std::string_view body(at_ + 1, size);
+  at_ += 1 + size;
+  return body;
+}
+
+std::optional<std::string_view> Checker::key() {
+  if (isAtEnd()) return std::nullopt;
+  const std::uint8_t first = byteAt(at_);
+  if (encoding::isText(first)) return textBody();
+  // An array or a map has problems of its own, which come first.
+  if (!encoding::isArray(first) && !encoding::isMap(first) && value(0))
+    refuse("has a key that is not a text");
+  return std::nullopt;
+}
+
+bool Checker::isValidKey(std::string_view key) {
+  if (isText(key)) return true;
+  return refuse(isUtf8(key) ? "has a key with a noncharacter" : "has a key that is not UTF-8");
+}
+
+bool Checker::value(std::size_t levels) {
+  if (isAtEnd()) return false;
+  const std::uint8_t first = byteAt(at_);
+  if (const std::size_t length = encoding::kNumberLengths[first]) {
+    if (length > left()) return false;
+    at_ += length;
+    return true;
+  }
+  if (encoding::isText(first)) return text();
+  if (encoding::isArray(first)) return array(levels);
+  if (encoding::isMap(first)) return map(levels);
+  if (encoding::isExtension(first)) return extension();
+  if (encoding::isBinary(first)) return refuse("holds binary data");
+  return first == encoding::kNil && refuse("holds nil");
+}
+
+bool Checker::text() {
+  const std::optional<std::string_view> text = textBody();
+  if (!text) return false;
+  if (isAscii(*text) || isText(*text)) return true;
+  return refuse(isUtf8(*text) ? "holds text with a noncharacter" : "holds text that is not UTF-8");
+}
+
+bool Checker::extension() {
+  const std::optional<std::string_view> extension = body();
+  if (!extension) return false;
+  const auto type = static_cast<signed char>(*(extension->data() - 1));
+  if (type != kTimestampExtension) return refuse("holds an extension other than a date");
+  return dateOfTimestamp(*extension) || refuse("holds a malformed date");
+}
+
+bool Checker::array(std::size_t levels) {
+  if (levels == 0) return false;
+  const std::optional<std::size_t> elements = count();
+  if (!elements) return false;
+  for (std::size_t left = *elements; left > 0; --left) {
+    if (!value(levels - 1)) return false;
+  }
+  return true;
+}
+
+bool Checker::map(std::size_t levels) {
+  if (levels == 0) return false;
+  const std::optional<std::size_t> entries = count();
+  if (!entries || *entries > PackedMapReader::kMaxNestedKeys) return false;
+  std::array<std::string_view, PackedMapReader::kMaxNestedKeys> keys;
+  for (std::size_t place = 0; place < *entries; ++place) {
+    const std::optional<std::string_view> next = key();
+    if (!next || !isValidKey(*next)) return false;
+    for (std::size_t earlier = 0; earlier < place; ++earlier) {
+      if (keys[earlier] == *next) return false;
+    }
+    keys[place] = *next;
+    if (!value(levels - 1)) return false;
+  }
+  return true;
+}
+
+// Most values are short: copies some bytes more instead of exactly `size`, where `from` in `bytes` has them.
+char* copyValue(char* to, const char* from, std::size_t size, std::string_view bytes) {
+  if (size <= kOvershoot && static_cast<std::size_t>(bytes.data() + bytes.size() - from) >= kOvershoot) {
+    std::memcpy(to, from, kOvershoot);
+    return to + size;
+  }
+  return copyBytes(to, from, size);
+}
+
+}  // namespace
+
+PackedMapReader::Read PackedMapReader::read(std::string_view bytes, PackedChunk* chunk) {
+  Checker checker(bytes);
+  const auto stopped = [&] {
+    const bool isRefused = checker.refused() != nullptr;
+    return Read{isRefused ? Result::kRefused : Result::kTree, {}, isRefused ? checker.refused() : ""};
+  };
+  if (bytes.empty() || !encoding::isMap(byteAt(bytes.data()))) return {};
+  const std::optional<std::size_t> entries = checker.count();
+  if (!entries) return {};
+  if (values_.size() < bytes.size() + kOvershoot) values_.resize(bytes.size() + kOvershoot);
+  char* end = values_.data();
+  ShapeTable::Place place = ShapeTable::root();
+  for (std::size_t left = *entries; left > 0; --left) {
+    const std::optional<std::string_view> key = checker.key();
+    if (!key) return stopped();
+    ShapeTable::Place next = shapes_.find(place, *key);
+    if (next == ShapeTable::none()) {
+      if (!checker.isValidKey(*key)) return stopped();
+      next = shapes_.add(place, *key);
+      if (next == ShapeTable::none()) return {};
+    }
+    place = next;
+    const char* const value = checker.at();
+    if (!checker.value(kArgumentLevels - 1)) return stopped();
+    end = copyValue(end, value, static_cast<std::size_t>(checker.at() - value), bytes);
+  }
+  if (!checker.isAtEnd()) return {};
+  const Shape* shape = shapes_.shapeAt(place);
+  if (shape == nullptr || shape->hasDoubledKey()) return {};
+  const std::string_view values(values_.data(), static_cast<std::size_t>(end - values_.data()));
+  Read packed{Result::kPacked, ValueMap(PackedMap::make(*shape, values, chunk)), ""};
+  if (values_.size() > kKeptBytes) values_ = {};
+  return packed;
+}
+
+}  // namespace tonewerk
