@@ -27,7 +27,7 @@ struct Entry {
   bool changes = false;
 };
 
-struct Shape {
+struct MessageKind {
   std::uint32_t category;
   std::uint16_t type;
   std::vector<Entry> entries;
@@ -36,8 +36,8 @@ struct Shape {
 constexpr std::string_view kFormat = "48000 Hz, 2 ch, Float32";
 
 // No two have the same category and type: a message is compared with the newest one of its category and type.
-const std::vector<Shape>& shapes() {
-  static const std::vector<Shape> all{
+const std::vector<MessageKind>& messageKinds() {
+  static const std::vector<MessageKind> all{
       {4,
        0,
        {{"position", Value(), true},
@@ -191,7 +191,7 @@ double now() {
   return std::chrono::duration<double>(std::chrono::system_clock::now().time_since_epoch()).count();
 }
 
-ValueMap payloadOf(const Shape& shape, std::int64_t state, double time) {
+ValueMap payloadOf(const MessageKind& shape, std::int64_t state, double time) {
   ValueMap payload{{IngestMessages::kTimeKey, Value(time)}};
   for (const Entry& entry : shape.entries) {
     // Counters take three bytes, as they do after a while.
@@ -219,7 +219,7 @@ void eachClientMessage(const ClientMessagePlan& plan,
     const bool isStored = plan.allChange || kChanges[round / kKinds % kChanges.size()];
     if (isStored && (kind == 0 || plan.allChange)) ++state;
     for (const std::size_t session : order) {
-      const Shape& shape = shapes()[(session * kKinds + kind) % shapes().size()];
+      const MessageKind& shape = messageKinds()[(session * kKinds + kind) % messageKinds().size()];
       time += 0.02;
       take({plan.firstReporterID + static_cast<std::int64_t>(session), shape.category, shape.type},
            payloadOf(shape, state, time), isStored);
