@@ -6,26 +6,17 @@
 #include <cstdint>
 #include <limits>
 
+#include "values/EncodedValue.h"
+
 namespace tonewerk {
 namespace {
 
 constexpr std::uint64_t kNanosecondsPerSecond = 1'000'000'000;
 constexpr unsigned kSecondsBits = 34;  // of the 8-byte form; nanoseconds have the other 30
 
-std::uint64_t bigEndian(std::string_view bytes) {
-  std::uint64_t number = 0;
-  for (const char byte : bytes) number = number << 8U | static_cast<std::uint8_t>(byte);
-  return number;
-}
-
 void appendBigEndian(std::string& out, std::uint64_t number, std::size_t bytes) {
   for (std::size_t left = bytes; left > 0; --left)
     out += static_cast<char>(number >> (8 * (left - 1)) & 0xFFU);
-}
-
-std::optional<Date> dateOf(std::int64_t seconds, std::uint64_t nanoseconds) {
-  if (nanoseconds >= kNanosecondsPerSecond) return std::nullopt;
-  return Date{static_cast<double>(seconds) + static_cast<double>(nanoseconds) / 1e9};
 }
 
 std::int64_t saturated(double seconds) {
@@ -37,21 +28,7 @@ std::int64_t saturated(double seconds) {
 
 }  // namespace
 
-std::optional<Date> dateOfTimestamp(std::string_view body) {
-  switch (body.size()) {
-    case 4:
-      return dateOf(static_cast<std::int64_t>(bigEndian(body)), 0);
-    case 8: {
-      const std::uint64_t both = bigEndian(body);
-      const std::uint64_t seconds = both & ((std::uint64_t{1} << kSecondsBits) - 1);
-      return dateOf(static_cast<std::int64_t>(seconds), both >> kSecondsBits);
-    }
-    case 12:
-      return dateOf(static_cast<std::int64_t>(bigEndian(body.substr(4))), bigEndian(body.substr(0, 4)));
-    default:
-      return std::nullopt;
-  }
-}
+std::optional<Date> dateOfTimestamp(std::string_view body) { return encoding::dateOf(body); }
 
 std::string timestampOf(Date date) {
   const double whole = std::isnan(date.seconds) ? 0.0 : std::floor(date.seconds);
