@@ -3,6 +3,8 @@
 
 #include <algorithm>
 
+#include "values/ValueView.h"
+
 namespace tonewerk {
 
 std::vector<std::size_t> TWReportingSessionWorkerUtility::mergeRapidMessages(
@@ -46,9 +48,11 @@ TWReportingSessionMessages TWReportingSessionWorkerUtility::combineRapidMessages
 }
 
 bool TWReportingSessionWorkerUtility::isVidroXYerrorMessage(const TWReportingSessionMessage& message) {
-  return std::any_of(message.message.begin(), message.message.end(), [](const ValueMap::Entry& entry) {
-    return entry.key.view().starts_with("vdac_invalid_");
+  bool isError = false;
+  message.message.forEach([&isError](const SharedString& key, ValueView) {
+    isError = isError || key.view().starts_with("vdac_invalid_");
   });
+  return isError;
 }
 
 }  // namespace tonewerk

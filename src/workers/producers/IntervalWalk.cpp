@@ -14,8 +14,8 @@ double numberOrZero(const std::optional<Value>& value) { return value ? value->n
 
 // When the message was sent; none when it does not say so.
 std::optional<Value> timestampOf(const ValueMap& message) {
-  const Value* timestamp = message.find(TWReportingMessageKeyTWTimestamp);
-  return timestamp == nullptr ? std::nullopt : std::optional<Value>(*timestamp);
+  const ValueView timestamp = message.view(TWReportingMessageKeyTWTimestamp);
+  return timestamp ? std::optional<Value>(timestamp.value()) : std::nullopt;
 }
 
 }  // namespace
@@ -28,15 +28,15 @@ Value IntervalWalk::Interval::bucketedLength() const {
 }
 
 IntervalWalk::Latest::Latest(const IntervalWalk& walk, std::string_view key, std::optional<Value> initial)
-    : walk_(walk), key_(key), initial_(std::move(initial)), value_(walk.previousValues_.find(key)) {
-  if (value_ == nullptr && initial_) value_ = &*initial_;
+    : walk_(walk), key_(key), initial_(std::move(initial)), value_(walk.previousValues_.view(key)) {
+  if (!value_ && initial_) value_ = ValueView(*initial_);
 }
 
-const Value* IntervalWalk::Latest::find() {
+ValueView IntervalWalk::Latest::find() {
   const std::size_t current = walk_.walked_.size() - 1;
   for (std::size_t place = current; place > searched_; --place) {
-    const Value* found = in(place - 1);
-    if (found == nullptr) continue;
+    const ValueView found = in(place - 1);
+    if (!found) continue;
     value_ = found;
     break;
   }
@@ -44,38 +44,38 @@ const Value* IntervalWalk::Latest::find() {
   return value_;
 }
 
-const Value* IntervalWalk::Latest::now() { return in(walk_.walked_.size() - 1); }
+ValueView IntervalWalk::Latest::now() { return in(walk_.walked_.size() - 1); }
 
 // Remembers the message, because the walk mostly asks for the same one again at its next step.
-const Value* IntervalWalk::Latest::in(std::size_t place) {
+ValueView IntervalWalk::Latest::in(std::size_t place) {
   if (lookedUp_ != place + 1) {
     lookedUp_ = place + 1;
-    found_ = walk_.walked_[place]->find(key_);
+    found_ = walk_.walked_[place]->view(key_);
   }
   return found_;
 }
 
 // These search for the earlier value first: it is in the message that in() remembers.
 bool IntervalWalk::Latest::changesText() {
-  const Value* before = find();
-  const Value* after = now();
-  if (before == nullptr || after == nullptr) return false;
-  const SharedString* textBefore = before->asString();
-  const SharedString* textAfter = after->asString();
-  if (textBefore != nullptr && textAfter != nullptr) return !(*textBefore == *textAfter);
-  return before->text() != after->text();
+  const ValueView before = find();
+  const ValueView after = now();
+  if (!before || !after) return false;
+  const auto textBefore = before.asText();
+  const auto textAfter = after.asText();
+  if (textBefore && textAfter) return *textBefore != *textAfter;
+  return before.text() != after.text();
 }
 
 bool IntervalWalk::Latest::changesNumber() {
-  const Value* before = find();
-  const Value* after = now();
-  return before != nullptr && after != nullptr && before->number() != after->number();
+  const ValueView before = find();
+  const ValueView after = now();
+  return before && after && before.number() != after.number();
 }
 
 bool IntervalWalk::Latest::changes() {
-  const Value* before = find();
-  const Value* after = now();
-  return before != nullptr && after != nullptr && !(*before == *after);
+  const ValueView before = find();
+  const ValueView after = now();
+  return before && after && !(before == after);
 }
 
 IntervalWalk::IntervalWalk(const Kind& kind, const LogSite& site, double minimumSeconds,
@@ -119,12 +119,12 @@ TWReportingSessionMessages IntervalWalk::summariesOf(const TWReportingSessionMes
 }
 
 void IntervalWalk::step() {
-  running_ = message().find(kind_.runningKey);
-  if (!wasRunning_ && running_ == nullptr) return;
-  const bool saysOn = running_ != nullptr && running_->boolean();
+  running_ = message().view(kind_.runningKey);
+  if (!wasRunning_ && !running_) return;
+  const bool saysOn = running_.boolean();
   const bool isLast = message().contains(TWReportingMessageKeySessionDuration);
   bool ends = isLast;
-  if (running_ != nullptr) {
+  if (running_) {
     isRunning_ = saysOn;
     if (!wasRunning_ && isRunning_ && begins()) begin_ = timestampOf(message());
     if (!isRunning_) ends = true;
@@ -141,7 +141,7 @@ void IntervalWalk::step() {
     begin_ = timestamp;  // of the next interval, when output or input keeps running
   }
   if (!isRunning_) begin_.reset();
-  if (running_ != nullptr) wasRunning_ = saysOn;
+  if (running_) wasRunning_ = saysOn;
 }
 
 void IntervalWalk::endInterval(const std::optional<Value>& end) {

@@ -11,6 +11,7 @@
 #include "platform/Log.h"
 #include "session/TWReportingSessionMessage.h"
 #include "values/Value.h"
+#include "values/ValueView.h"
 
 namespace tonewerk {
 
@@ -81,12 +82,12 @@ class IntervalWalk {
     Latest(const Latest&) = delete;
     Latest& operator=(const Latest&) = delete;
 
-    // Null when there is none. Valid as long as the walk.
-    const Value* find();
+    // None when there is none. Valid as long as the walk.
+    ValueView find();
     // Only when there is one.
-    const Value& value() { return *find(); }
-    // What the message that is being looked at says; null when it does not have the key.
-    const Value* now();
+    Value value() { return find().value(); }
+    // What the message that is being looked at says; none when it does not have the key.
+    ValueView now();
 
     // Whether there are both values, and they differ: in their texts, as numbers, or as values.
     bool changesText();
@@ -94,21 +95,21 @@ class IntervalWalk {
     bool changes();
 
    private:
-    const Value* in(std::size_t place);
+    ValueView in(std::size_t place);
 
     const IntervalWalk& walk_;
     const std::string_view key_;
     const std::optional<Value> initial_;
-    const Value* value_ = nullptr;  // the latest one in the first searched_ messages
+    ValueView value_;  // the latest one in the first searched_ messages
     std::size_t searched_ = 0;
     std::size_t lookedUp_ = 0;  // place + 1 of the message that `found_` is from; 0 for none
-    const Value* found_ = nullptr;
+    ValueView found_;
   };
 
   // The message that is being looked at.
   const ValueMap& message() const { return *walked_.back(); }
   // Whether it says that output or input runs, or that it does not.
-  bool saysRunning() const { return running_ != nullptr; }
+  bool saysRunning() const { return static_cast<bool>(running_); }
 
  private:
   // Whether a message that starts output or input begins an interval.
@@ -131,7 +132,7 @@ class IntervalWalk {
   const double minimumSeconds_;
   const ValueMap previousValues_;
   std::vector<const ValueMap*> walked_;  // up to the message that is being looked at
-  const Value* running_ = nullptr;       // what this message says
+  ValueView running_;                    // what this message says
   bool wasRunning_ = false;              // what the latest message before it says that says something
   bool isRunning_ = false;
   std::optional<Value> begin_;  // the time at which the current interval began

@@ -29,7 +29,7 @@ class GatherWalk final : public IntervalWalk {
       : IntervalWalk(kKind, site, minimumPlaytime, std::move(previousValues)) {}
 
  private:
-  static bool isInGather(const Value* gather) { return integerOf(gather) == 1; }
+  static bool isInGather(ValueView gather) { return gather.integer() == 1; }
 
   bool begins() override { return isInGather(gather_.now()); }
 
@@ -38,12 +38,12 @@ class GatherWalk final : public IntervalWalk {
     if (saysRunning() && isInGather(gather_.find()) && !isInGather(gather_.now())) return true;
     if (selectedFormat_.changesText() || activeDevices_.changesText()) return true;
     // A 0 without a start of output ends no interval in a Gather session. It ends one that is in none.
-    const Value* gather = gather_.now();
-    return gather != nullptr && gather->integer() == 0 && !isInGather(gather_.find());
+    const ValueView gather = gather_.now();
+    return gather && gather.integer() == 0 && !isInGather(gather_.find());
   }
 
   std::optional<ValueMap> summaryOf(const Interval& interval) override {
-    if (gather_.find() == nullptr) return std::nullopt;
+    if (!gather_.find()) return std::nullopt;
     return ValueMap{{TWReportingMessageKeySelectedFormat, selectedFormat_.value()},
                     {TWReportingMessageKeyFormatID, formatID_.value()},
                     {TWReportingMessageKeyActiveDevices, activeDevices_.value()},

@@ -56,9 +56,11 @@ class InputWalk final : public IntervalWalk {
 
   void collect() override {
     if (!vocoder_.changes()) return;
-    const std::string rate = textOf(message().find(TWReportingMessageKeyVpConfigPrimaryVocoderFs));
+    const Value* noRate = nullptr;
+    const ValueView sampleRate = message().view(TWReportingMessageKeyVpConfigPrimaryVocoderFs);
+    const std::string rate = sampleRate ? sampleRate.text() : textOf(noRate);
     if (rate.starts_with(kNoRate)) return;
-    vocoders_.insert(vocoder_.now()->text() + ":" + rate);
+    vocoders_.insert(vocoder_.now().text() + ":" + rate);
   }
 
   std::optional<ValueMap> summaryOf(const Interval& interval) override {

@@ -42,15 +42,15 @@ class VolumeWalk final : public IntervalWalk {
   }
 
   std::optional<ValueMap> summaryOf(const Interval& interval) override {
-    const Value* volume = volume_.find();
-    if (process_ == nullptr || volume == nullptr) return std::nullopt;
+    const ValueView volume = volume_.find();
+    if (process_ == nullptr || !volume) return std::nullopt;
     return ValueMap{{TWReportingMessageKeySelectedFormat, selectedFormat_.value()},
                     {TWReportingMessageKeyFormatID, formatID_.value()},
                     {TWReportingMessageKeyActiveDevices, activeDevices_.value()},
                     {TWReportingApplicationName, *process_},
-                    {TWReportingMessageKeyVolume, *volume},
+                    {TWReportingMessageKeyVolume, volume.value()},
                     {TWReportingMessageKeyVolumeBucketed,
-                     TWReportingUtilityBucketNumberToString(volume->number(),
+                     TWReportingUtilityBucketNumberToString(volume.number(),
                                                             TWReportingUtilityBucketNumberToStringVolumes, 4)
                          .value_or("")},
                     {TWReportingMessageKeyPlayseconds, interval.length()},

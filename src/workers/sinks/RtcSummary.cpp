@@ -6,13 +6,15 @@
 #include <unordered_map>
 #include <vector>
 
+#include "values/ValueView.h"
+
 namespace tonewerk {
 namespace {
 
 // Joined texts under keys, in the order in which the keys first came.
 class JoinedTexts {
  public:
-  void add(const SharedString& key, const Value& value) {
+  void add(const SharedString& key, ValueView value) {
     const std::size_t place = placeOf(key);
     guess_ = place + 1;
     if (place == texts_.size()) {
@@ -21,8 +23,8 @@ class JoinedTexts {
     }
     std::string& text = texts_[place].text;
     text += ',';
-    if (const SharedString* same = value.asString()) {
-      text += same->view();
+    if (const auto same = value.asText()) {
+      text += *same;
     } else {
       text += value.text();
     }
@@ -64,10 +66,11 @@ bool isMeantFor(const TWReportingSessionWorkerClass& workerClass, const TWReport
 ValueMap rtcSummaryOf(const TWReportingSessionMessages& messages, AudioServiceType serviceType,
                       const TWReportingSessionWorkerClass& workerClass) {
   JoinedTexts summary;
-  summary.add("TW_Session_Summary_Event", serviceType);
+  summary.add("TW_Session_Summary_Event", Value(serviceType));
   for (const auto& message : messages) {
     if (message->isRedundant || !message->isSessionStarted || !isMeantFor(workerClass, *message)) continue;
-    for (const ValueMap::Entry& entry : message->message) summary.add(entry.key, entry.value);
+    message->message.forEach(
+        [&summary](const SharedString& key, ValueView value) { summary.add(key, value); });
   }
   return summary.map();
 }

@@ -13,6 +13,7 @@
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingUtility.h"
+#include "values/ValueView.h"
 #include "workers/sinks/TWReportingDPSettings.h"
 
 namespace tonewerk {
@@ -39,7 +40,7 @@ std::optional<Value> readDefault(std::string_view key) {
 }
 
 std::int32_t bufferSizeOf(const TWReportingSessionMessage& message) {
-  return integer32Of(message.message.find(kSmallestBufferFrameSize));
+  return message.message.view(kSmallestBufferFrameSize).integer32();
 }
 
 // Whole microseconds; 0 for a number that is no time.
@@ -105,7 +106,7 @@ bool TWReportingSessionDPWorker::handleMessage(const TWReportingSessionMessage& 
   }
   debugLog(TWReportingDPLogCategory(),
            "Did not drop whirlcap, right conditions not met: buffer size : %d, time diff : %f, io cycle: %d",
-           bufferSizeOf(message), now - lastMessageTime_, integerOf(message.message.find(kIoCycle)));
+           bufferSizeOf(message), now - lastMessageTime_, message.message.integer(kIoCycle));
   return false;
 }
 
@@ -113,7 +114,7 @@ bool TWReportingSessionDPWorker::meetsConditions(const TWReportingSessionMessage
   if (!interestedInMessage(message)) return false;
   if (bufferSizeOf(message) < settings().ioBufferSize) return false;
   if (lastMessageTime_ != 0.0 && now - lastMessageTime_ <= kSecondsBetweenRequests) return false;
-  return integerOf(message.message.find(kIoCycle)) >= settings().ioCycle;
+  return message.message.integer(kIoCycle) >= settings().ioCycle;
 }
 
 const TWReportingDefaults& TWReportingSessionDPWorker::getUserDefaults() {

@@ -13,6 +13,7 @@
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingUtility.h"
+#include "values/ValueView.h"
 
 namespace tonewerk {
 namespace {
@@ -51,13 +52,13 @@ const TWReportingSessionWorkerClass TWReportingSessionSummaryWorker::kWorkerClas
 
 bool TWReportingSessionSummaryWorker::handleMessage(const TWReportingSessionMessage& message) {
   assert(TWReportingUtilityIsOnReportingServerQueue());
-  if (const Value* duration = message.message.find(TWReportingMessageKeySessionDuration)) {
-    totalActiveTime_ += duration->number();
+  if (const ValueView duration = message.message.view(TWReportingMessageKeySessionDuration)) {
+    totalActiveTime_ += duration.number();
     ++activeCount_;
     return false;
   }
-  const Value* issueType = message.message.find(TWReportingMessageKeyIssueType);
-  if (issueType != nullptr && *issueType == kOverload) ++overloadCount_;
+  const ValueView issueType = message.message.view(TWReportingMessageKeyIssueType);
+  if (issueType && issueType == ValueView(kOverload)) ++overloadCount_;
   return false;
 }
 

@@ -7,6 +7,7 @@
 #include <nlohmann/json.hpp>
 
 #include "values/CompactJson.h"
+#include "values/ValueView.h"
 
 namespace tonewerk {
 namespace {
@@ -55,28 +56,51 @@ class PrettyWriter {
 
   // False if JSON cannot express a value; problem() then names it.
   bool write(const ValueMap& map) {
-    return writeList('{', '}', map, [this](const ValueMap::Entry& entry, std::size_t) {
-      writeKey(entry.key);
-      return write(entry.value) || isWithin(entry.key.string());
+    return writeList('{', '}', map.empty(), [&](auto&& writeElement) {
+      map.forEach([&](const SharedString& key, ValueView value) {
+        writeElement([&] {
+          writeKey(key);
+          return write(value) || isWithin(key.string());
+        });
+      });
     });
   }
   std::string problem() const { return place_ + " is " + inexpressible_ + ", which JSON cannot say"; }
 
  private:
-  bool write(const Value& value) {
-    if (const ValueMap* map = value.asMap()) return write(*map);
-    if (const ValueArray* array = value.asArray()) {
-      return writeList('[', ']', *array, [this](const Value& element, std::size_t index) {
-        return write(element) || isWithin("[" + std::to_string(index) + "]");
+  bool write(ValueView view) {
+    const Value* value = view.held();
+    if (value == nullptr) return writeEncoded(view.encoded());
+    if (const ValueMap* map = value->asMap()) return write(*map);
+    if (const ValueArray* array = value->asArray()) {
+      return writeList('[', ']', array->empty(), [&](auto&& writeElement) {
+        std::size_t index = 0;
+        for (const Value& element : *array) {
+          writeElement([&] { return write(element) || isWithin("[" + std::to_string(index) + "]"); });
+          ++index;
+        }
       });
     }
-    const double* number = value.asDouble();
-    if (number != nullptr && !std::isfinite(*number)) {
-      inexpressible_ = value.text();
-      return false;
+    const double* number = value->asDouble();
+    if (number != nullptr && !std::isfinite(*number)) return isInexpressible(view);
+    appendCompactJson(out_, *value);
+    return true;
+  }
+
+  // Only arrays and maps inside a packed map get values of their own.
+  bool writeEncoded(EncodedValue value) {
+    const Value::Kind kind = value.kind();
+    if (kind == Value::Kind::kArray || kind == Value::Kind::kMap) return write(ValueView(value.value()));
+    if (kind == Value::Kind::kDouble && !std::isfinite(ValueView(value).number())) {
+      return isInexpressible(ValueView(value));
     }
     appendCompactJson(out_, value);
     return true;
+  }
+
+  bool isInexpressible(ValueView value) {
+    inexpressible_ = value.text();
+    return false;
   }
 
   // Nearly all keys need no escapes, and for those no value has to be made.
@@ -95,18 +119,23 @@ class PrettyWriter {
     out_ += ": ";
   }
 
-  template <typename List, typename WriteElement>
-  bool writeList(char open, char close, const List& list, WriteElement writeElement) {
+  // `writeElements` calls its argument with a function for each element, which writes it and returns whether
+  // it could. After a failure the rest is not written.
+  template <typename WriteElements>
+  bool writeList(char open, char close, bool isEmpty, WriteElements writeElements) {
     out_ += open;
     indentation_ += 2;
-    std::size_t index = 0;
-    for (const auto& element : list) {
-      if (index > 0) out_ += ',';
+    bool isFirst = true;
+    bool isWritten = true;
+    writeElements([&](auto&& writeElement) {
+      if (!isWritten) return;
+      if (!std::exchange(isFirst, false)) out_ += ',';
       startLine();
-      if (!writeElement(element, index++)) return false;
-    }
+      isWritten = writeElement();
+    });
+    if (!isWritten) return false;
     indentation_ -= 2;
-    if (!list.empty()) startLine();
+    if (!isEmpty) startLine();
     out_ += close;
     return true;
   }
