@@ -11,6 +11,8 @@
 
 namespace tonewerk {
 
+class ShapeTable;
+
 // Sends answers to a peer. Any thread.
 class ReplySink {
  public:
@@ -95,6 +97,10 @@ class RequestHandler {
   // Runs on the messaging thread and must not block: delivers the requests, or sees that another thread does,
   // in the order of these calls. A transport that decodes on its own thread calls handleRequest() instead.
   virtual void handleReceived(std::unique_ptr<ReceivedRequests> requests) { requests->deliver(); }
+
+  // The table for the shapes of maps among the arguments; null when they are to be trees. Asked for, and used,
+  // on the thread that delivers.
+  virtual ShapeTable* shapes() { return nullptr; }
 
   // Runs on the messaging thread for each request in the order of arrival, before it is checked. True when it
   // must not wait for what handleReceived() has passed on: it is then delivered at once on the messaging

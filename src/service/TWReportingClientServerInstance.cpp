@@ -11,6 +11,7 @@
 #include "protocol/Requests.h"
 #include "service/MessageTap.h"
 #include "service/TWReportingServiceDelegateProtocol.h"
+#include "session/MessageShapes.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionMessage.h"
 #include "session/TWReportingTracePoint.h"
@@ -36,7 +37,8 @@ TWReportingClientServerInstance::TWReportingClientServerInstance(
     std::int32_t processIdentifier, std::weak_ptr<TWReportingServiceDelegateProtocol> delegate)
     : processIdentifier_(processIdentifier),
       delegate_(std::move(delegate)),
-      budget_(std::make_shared<KeptBytesBudget>()) {
+      budget_(std::make_shared<KeptBytesBudget>()),
+      shapes_(makeMessageShapes()) {
   infoLog(category(), "new client with pid %lu", processIdentifier);
 }
 
@@ -276,7 +278,7 @@ TWReportingClientServerInstance::Session TWReportingClientServerInstance::ownSes
 
 TWReportingClientServerInstance::Session TWReportingClientServerInstance::makeSession(
     ReporterID reporterID) const {
-  return TWReportingSession::initWithID(reporterID, {processIdentifier_}, budget_);
+  return TWReportingSession::initWithID(reporterID, {processIdentifier_}, budget_, shapes_);
 }
 
 void TWReportingClientServerInstance::handleConnectionError() {

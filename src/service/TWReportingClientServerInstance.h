@@ -19,6 +19,7 @@
 namespace tonewerk {
 
 class TWReportingServiceDelegateProtocol;
+class ShapeTable;
 class TWReportingSession;
 
 // Represents a connected client process and its sessions, and carries out its requests.
@@ -79,6 +80,9 @@ class TWReportingClientServerInstance final
 
   const SessionMap& clientReportingSessionMap() const;
 
+  // The shapes of this client's messages. The table is used on the work queue.
+  const std::shared_ptr<ShapeTable>& shapes() const { return shapes_; }
+
   // From now on keeps the client's sessions in `index`, under `number`. Called once, before the first request.
   void listSessionsIn(std::shared_ptr<SessionIndex> index, SessionIndex::ClientNumber number);
 
@@ -102,6 +106,7 @@ class TWReportingClientServerInstance final
   const std::int32_t processIdentifier_;
   const std::weak_ptr<TWReportingServiceDelegateProtocol> delegate_;
   const std::shared_ptr<KeptBytesBudget> budget_;
+  const std::shared_ptr<ShapeTable> shapes_;
   SessionMap clientReportingSessionMap_;
   std::shared_ptr<SessionIndex> index_;  // null until the service has registered the client
   SessionIndex::ClientNumber number_ = 0;

@@ -58,10 +58,12 @@ bool TWReportingService::listenerShouldAcceptNewConnection(MessagingConnection& 
       const auto listed = weakClient.lock();
       if (service != nullptr && listed != nullptr) registerClient(listed);
     });
+    std::shared_ptr<ShapeTable> shapes = client->shapes();
     connection.setRequestHandler(
         requests::all(),
         std::make_shared<TWReportingServiceExport>(
-            std::move(client), std::make_unique<WatchRequests>(processIdentifier, weak_from_this())));
+            std::move(client), std::make_unique<WatchRequests>(processIdentifier, weak_from_this()),
+            std::move(shapes)));
   }
   connection.setInterruptionHandler([weakClient] {
     const auto client = weakClient.lock();

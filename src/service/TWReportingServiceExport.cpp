@@ -137,8 +137,9 @@ static_assert(std::size(kHandlers) == requests::kAll.size(), "a handler has no r
 }  // namespace
 
 TWReportingServiceExport::TWReportingServiceExport(std::shared_ptr<TWReportingServiceProtocol> object,
-                                                   std::unique_ptr<WatchRequests> watch)
-    : object_(std::move(object)), watch_(std::move(watch)) {}
+                                                   std::unique_ptr<WatchRequests> watch,
+                                                   std::shared_ptr<ShapeTable> shapes)
+    : object_(std::move(object)), watch_(std::move(watch)), shapes_(std::move(shapes)) {}
 
 TWReportingServiceExport::~TWReportingServiceExport() = default;
 

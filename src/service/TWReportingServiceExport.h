@@ -20,8 +20,10 @@ class WatchRequests;
 // onlooker's requests that change something are refused, and so is a client's request to be an onlooker.
 class TWReportingServiceExport final : public RequestHandler {
  public:
+  // Maps among the arguments get their shapes from `shapes`; they are trees without it.
   TWReportingServiceExport(std::shared_ptr<TWReportingServiceProtocol> object,
-                           std::unique_ptr<WatchRequests> watch);
+                           std::unique_ptr<WatchRequests> watch,
+                           std::shared_ptr<ShapeTable> shapes = nullptr);
   ~TWReportingServiceExport() override;
 
   // `method`: the index in requests::all(). Runs on the work queue or, for transports that decode themselves
@@ -29,6 +31,7 @@ class TWReportingServiceExport final : public RequestHandler {
   void handleRequest(std::size_t method, Arguments arguments, Reply reply, InFlightToken token) override;
   // Has the work queue deliver the requests, so that no value is made on one thread and freed on another.
   void handleReceived(std::unique_ptr<ReceivedRequests> requests) override;
+  ShapeTable* shapes() override { return shapes_.get(); }
   // True for the request to end the process, which does not wait for the work queue. But once the connection
   // has asked to be an onlooker, the answer to that comes first.
   bool isUrgent(std::size_t method) override;
@@ -43,6 +46,7 @@ class TWReportingServiceExport final : public RequestHandler {
   bool hasAskedToObserve_ = false;  // used on the messaging thread
   const std::shared_ptr<TWReportingServiceProtocol> object_;
   const std::unique_ptr<WatchRequests> watch_;
+  const std::shared_ptr<ShapeTable> shapes_;
 };
 
 }  // namespace tonewerk

@@ -11,6 +11,8 @@
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingTracePoint.h"
 #include "session/TWReportingUtility.h"
+#include "values/ShapeTable.h"
+#include "values/ValueView.h"
 
 namespace tonewerk {
 namespace {
@@ -29,6 +31,20 @@ const SharedString kMethod("method");
 const SharedString kReporterID("reporterid");
 
 std::string_view yesOrNo(bool answer) { return answer ? "YES" : "NO"; }
+
+// What takes the place of a message's time.
+struct ReplacedDate {
+  ValueView invalid;  // the value of "invalid_timestamp"
+  double now;
+};
+
+// None for a time that is neither missing nor too old.
+std::optional<ReplacedDate> replacedDate(ValueView time) {
+  const double now = TWReportingContext::current().platform().clock.now();
+  if (!time) return ReplacedDate{ValueView(kNilText), now};
+  if (time.number() < now - kOldestTimestampSeconds) return ReplacedDate{time, now};
+  return std::nullopt;
+}
 
 bool contains(const std::vector<const TWReportingSessionWorkerClass*>& classes,
               const TWReportingSessionWorkerClass& wanted) {
@@ -59,12 +75,13 @@ const TWReportingSession::LifecycleTexts TWReportingSession::LifecycleTexts::kSt
 
 std::shared_ptr<TWReportingSession> TWReportingSession::initWithID(ReporterID reporterID,
                                                                    ProcessIdentifiers processIdentifiers,
-                                                                   std::shared_ptr<KeptBytesBudget> budget) {
+                                                                   std::shared_ptr<KeptBytesBudget> budget,
+                                                                   std::shared_ptr<ShapeTable> shapes) {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto& registry = TWReportingContext::current().workerRegistry();
   if (budget == nullptr) budget = std::make_shared<KeptBytesBudget>();
   auto session = std::make_shared<TWReportingSession>(Private(), reporterID, std::move(processIdentifiers),
-                                                      std::move(budget));
+                                                      std::move(budget), std::move(shapes));
   session->startWorkersFromClasses(registry.startOnInitClasses());
   infoLog(TWReportingSessionCategory(), "created reporting session for ID: %lli", reporterID);
   emitTracePoint(TWReportingTracePoint::kSessionCreated);
@@ -72,10 +89,12 @@ std::shared_ptr<TWReportingSession> TWReportingSession::initWithID(ReporterID re
 }
 
 TWReportingSession::TWReportingSession(Private, ReporterID reporterID, ProcessIdentifiers processIdentifiers,
-                                       std::shared_ptr<KeptBytesBudget> budget)
+                                       std::shared_ptr<KeptBytesBudget> budget,
+                                       std::shared_ptr<ShapeTable> shapes)
     : reporterID_(reporterID),
       processIdentifiers_(std::move(processIdentifiers)),
       budget_(std::move(budget)),
+      shapes_(std::move(shapes)),
       serviceName_(TWReportingUtilityGenerateServiceNameFromServiceType(kServiceUnknown)),
       applicationName_(TWReportingUtilityRetrieveAppName({})) {}
 
@@ -116,7 +135,7 @@ bool TWReportingSession::updateConfigurationWithContentsOfConfiguration(const Va
   }
   update.merge(*configuration);
   const MutexLock lock(propertiesMutex_);
-  if (!mergeWithinBudget(configuration_, update)) return false;
+  if (!mergeWithin(*budget_, configuration_, update)) return false;
   applicationName_ = TWReportingUtilityRetrieveAppName(configuration_);
   return true;
 }
@@ -226,10 +245,12 @@ void TWReportingSession::sendMessage(const std::shared_ptr<TWReportingSessionMes
                                      const MessageReply& reply) {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   ++totalMessageCount_;
-  addMissingDates(*message);
-  removeWhiteSpaceFromKeys(*message);
-  addAudioMessageTag(*message);
-  addAppName(*message);
+  if (!completePacked(*message)) {
+    addMissingDates(*message);
+    removeWhiteSpaceFromKeys(*message);
+    addAudioMessageTag(*message);
+    addAppName(*message);
+  }
   emitTracePoint(TWReportingTracePoint::kMessageReceived);
   message->isSessionStarted = started_;
   message->isRedundant = messageIsRedundant(*message);
@@ -318,15 +339,6 @@ void TWReportingSession::rememberAsNewest(const TWReportingSessionMessage& messa
   newest_[{message.category, message.type}] = &message;
 }
 
-bool TWReportingSession::mergeWithinBudget(ValueMap& map, const ValueMap& more) {
-  // A merge adds at most more.bytes(). The bytes that it replaced are given back afterwards.
-  const std::size_t before = map.bytes();
-  if (!budget_->take(more.bytes())) return false;
-  map.merge(more);
-  budget_->give(before + more.bytes() - map.bytes());
-  return true;
-}
-
 void TWReportingSession::logFullBudgetOnce() {
   if (!budget_->isFirstRefusal()) return;
   errorLog(
@@ -355,21 +367,42 @@ void TWReportingSession::forgetMessages() {
   messageBytes_ = 0;
 }
 
+bool TWReportingSession::completePacked(TWReportingSessionMessage& message) const {
+  const Shape* shape = message.message.shape();
+  if (shape == nullptr || shapes_ == nullptr || shape->hasKeyWithSpace()) return false;
+  if (const auto replaced = replacedDate(message.message.view(TWReportingInternalEventEpochTime))) {
+    const Value now = replaced->now;
+    if (!message.message.setPacked({{TWReportingInternalEventInvalidTimestamp, replaced->invalid},
+                                    {TWReportingInternalEventEpochTime, now}},
+                                   *shapes_)) {
+      return false;
+    }
+    shape = message.message.shape();
+  }
+  const std::lock_guard lock(message);
+  const ValueMapEntry tag{TWReportingInternalEventAudioTag,
+                          TWReportingContext::current().names().audioTag(message.category, message.type)};
+  const ValueView name = message.message.view(TWReportingApplicationName);
+  const Shape* complete =
+      name && !(name == ValueView(kUnknownName))
+          ? shapes_->extended(*shape, {tag})
+          : shapes_->extended(*shape, {tag, {TWReportingApplicationName, applicationName_}});
+  return complete != nullptr && message.message.extend(*complete);
+}
+
 void TWReportingSession::addMissingDates(TWReportingSessionMessage& message) {
-  const double now = TWReportingContext::current().platform().clock.now();
-  const Value* timestamp = message.message.find(TWReportingInternalEventEpochTime);
-  const bool isTooOld = timestamp != nullptr && timestamp->number() < now - kOldestTimestampSeconds;
-  if (timestamp != nullptr && !isTooOld) return;
-  const Value invalid = timestamp == nullptr ? kNilText : *timestamp;
+  const auto replaced = replacedDate(message.message.view(TWReportingInternalEventEpochTime));
+  if (!replaced) return;
+  const Value invalid = replaced->invalid.value();
   message.message.set(TWReportingInternalEventInvalidTimestamp, invalid);
-  message.message.set(TWReportingInternalEventEpochTime, now);
+  message.message.set(TWReportingInternalEventEpochTime, replaced->now);
 }
 
 void TWReportingSession::removeWhiteSpaceFromKeys(TWReportingSessionMessage& message) {
   std::vector<ValueMap::Entry> spaced;
-  for (const ValueMap::Entry& entry : message.message) {
-    if (entry.key.view().find(' ') != std::string_view::npos) spaced.push_back(entry);
-  }
+  message.message.forEach([&spaced](const SharedString& key, ValueView value) {
+    if (key.view().find(' ') != std::string_view::npos) spaced.push_back({key, value.value()});
+  });
   for (const ValueMap::Entry& entry : spaced) {
     std::string repaired = entry.key.string();
     std::replace(repaired.begin(), repaired.end(), ' ', '_');
@@ -386,8 +419,8 @@ void TWReportingSession::addAudioMessageTag(TWReportingSessionMessage& message) 
 void TWReportingSession::addAppName(TWReportingSessionMessage& message) const {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   const std::lock_guard lock(message);
-  const Value* name = message.message.find(TWReportingApplicationName);
-  if (name != nullptr && !(*name == kUnknownName)) return;
+  const ValueView name = message.message.view(TWReportingApplicationName);
+  if (name && !(name == ValueView(kUnknownName))) return;
   message.message.set(TWReportingApplicationName, applicationName_);
 }
 
@@ -425,14 +458,14 @@ ValueMap TWReportingSession::configuration() const {
 
 ValueMap TWReportingSession::previousValues() const {
   const MutexLock lock(propertiesMutex_);
-  return previousValues_;
+  return previousValues_.merged();
 }
 
 void TWReportingSession::addPreviousValues(const ValueMap& values) {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   {
     const MutexLock lock(propertiesMutex_);
-    if (mergeWithinBudget(previousValues_, values)) return;
+    if (previousValues_.add(values, *budget_)) return;
   }
   logFullBudgetOnce();
 }

@@ -14,12 +14,15 @@
 #include "protocol/AudioEvent.h"
 #include "protocol/RequestSet.h"
 #include "session/KeptBytesBudget.h"
+#include "session/PreviousValues.h"
 #include "session/TWReportingSessionMessage.h"
 #include "session/TWReportingSessionWorkerClass.h"
 #include "values/Mutex.h"
 #include "values/Value.h"
 
 namespace tonewerk {
+
+class ShapeTable;
 
 // Represents one reporting session of one client, with its stored messages and its workers.
 //
@@ -42,12 +45,14 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
 
   // Makes the session and its start-on-init workers. The first process identifier is the owning process's.
   // The bytes that the session keeps are taken from `budget`; null gives the session a budget of its own.
+  // `shapes` are those of its client's messages (MessageShapes.h); without them completed messages are trees.
   static std::shared_ptr<TWReportingSession> initWithID(ReporterID reporterID,
                                                         ProcessIdentifiers processIdentifiers,
-                                                        std::shared_ptr<KeptBytesBudget> budget = nullptr);
+                                                        std::shared_ptr<KeptBytesBudget> budget = nullptr,
+                                                        std::shared_ptr<ShapeTable> shapes = nullptr);
 
   TWReportingSession(Private, ReporterID reporterID, ProcessIdentifiers processIdentifiers,
-                     std::shared_ptr<KeptBytesBudget> budget);
+                     std::shared_ptr<KeptBytesBudget> budget, std::shared_ptr<ShapeTable> shapes);
   TWReportingSession(const TWReportingSession&) = delete;
   TWReportingSession& operator=(const TWReportingSession&) = delete;
   ~TWReportingSession();
@@ -102,6 +107,8 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   // Moves the bytes that the session keeps out of the client's budget. For a session that the client has
   // given up but that may live on.
   void leaveBudget();
+  // Null when the session has none.
+  ShapeTable* shapes() const { return shapes_.get(); }
   // The stored messages, without redundant ones, in order of arrival; sorted by time while the session stops.
   const TWReportingSessionMessages& messages() const { return messages_; }
   // How many messages were received since the session was made or last stopped, and how many were redundant.
@@ -142,6 +149,9 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
     TWReportingSessionWorkerClass::Worker worker;
   };
 
+  // Does what addMissingDates(), addAudioMessageTag() and addAppName() do, without making a tree. Returns false
+  // when the message is a tree, or must become one; the message may then be complete in part.
+  [[nodiscard]] bool completePacked(TWReportingSessionMessage& message) const;
   std::shared_ptr<TWReportingSessionMessage> lifecycleMessage(AudioEventType type,
                                                               const LifecycleTexts& texts) const;
   void makeWorker(const TWReportingSessionWorkerClass& workerClass);
@@ -156,8 +166,6 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   // Returns false when the budget has no room for the message.
   [[nodiscard]] bool store(const std::shared_ptr<TWReportingSessionMessage>& message);
   void rememberAsNewest(const TWReportingSessionMessage& message);
-  // Adds `more` to `map`. Returns false, and changes nothing, when the budget has no room for it.
-  [[nodiscard]] bool mergeWithinBudget(ValueMap& map, const ValueMap& more) REQUIRES(propertiesMutex_);
   void logFullBudgetOnce();
   void logUnkeptCount();
   void forgetMessages();
@@ -165,6 +173,7 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   const ReporterID reporterID_;
   const ProcessIdentifiers processIdentifiers_;
   std::shared_ptr<KeptBytesBudget> budget_;
+  const std::shared_ptr<ShapeTable> shapes_;
   AudioServiceType serviceType_ = kServiceUnknown;
   std::string serviceName_;
   bool started_ = false;
@@ -186,7 +195,7 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   mutable Mutex propertiesMutex_;
   std::optional<std::string> clientProcessName_ GUARDED_BY(propertiesMutex_);
   ValueMap configuration_ GUARDED_BY(propertiesMutex_);
-  ValueMap previousValues_ GUARDED_BY(propertiesMutex_);
+  PreviousValues previousValues_ GUARDED_BY(propertiesMutex_);
   // In the order in which they were made. None is removed while the session lives.
   std::vector<MadeWorker> workers_ GUARDED_BY(propertiesMutex_);
 };

@@ -7,6 +7,7 @@
 
 #include "platform/Clock.h"
 #include "session/LocalTime.h"
+#include "session/MessageShapes.h"
 #include "session/SinkQueue.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingKeys.h"
@@ -63,7 +64,9 @@ void TWReportingSessionSummaryJsonFileWorker::stop() {
   std::size_t bytes = 0;
   for (const auto& message : owner->messages()) {
     if (message->isRedundant) continue;
-    message->message.set(TWReportingMessageKeyIsSessionStarted, message->isSessionStarted ? kYes : kNo);
+    setForAll(message->message,
+              {TWReportingMessageKeyIsSessionStarted, message->isSessionStarted ? kYes : kNo},
+              owner->shapes());
     bytes += sizeof(Entry) + message->message.bytes();
     entries.push_back({message->category, message->type, message->message});
   }

@@ -24,11 +24,17 @@ class RpcFrameScanner {
  public:
   enum class Result { kFrame, kNeedsMore, kBroken };
 
+  // Of so many arguments the frame says where they begin.
+  static constexpr std::size_t kMaxKnownArguments = 4;
+
   struct Frame {
     bool isNotification = false;
     std::uint32_t identifier = 0;  // of a request
     std::string_view method;       // points into the scanned bytes; UTF-8
     std::size_t bytes = 0;         // the frame's length
+    std::size_t argumentCount = 0;
+    // Where the first arguments begin, as offsets in the frame.
+    std::array<std::uint32_t, kMaxKnownArguments> arguments{};
   };
 
   // `bytes` begins with the frame's first byte. After kNeedsMore it must begin with the same bytes as before;
@@ -44,6 +50,7 @@ class RpcFrameScanner {
   struct Header;
 
   [[nodiscard]] Result scanHead(std::string_view bytes);
+  void noteArgument();
   [[nodiscard]] Result scanArguments(std::string_view bytes);
   [[nodiscard]] Result endFrame(std::string_view bytes);
   [[nodiscard]] Result needMore(std::string_view bytes);

@@ -4,7 +4,6 @@
 #include <cassert>
 #include <utility>
 
-#include "platform/linux/messagepack/RpcFrameDecoder.h"
 #include "platform/linux/threads/BatchScope.h"
 #include "values/ShortenedText.h"
 
@@ -36,7 +35,8 @@ UnixRequests::~UnixRequests() {
 
 void UnixRequests::add(const RpcFrameScanner::Frame& frame, std::string_view bytes,
                        std::optional<std::size_t> method) {
-  requests_.push_back({bytes, frame.identifier, frame.isNotification, method});
+  requests_.push_back(
+      {{bytes, frame.argumentCount, frame.arguments}, frame.identifier, frame.isNotification, method});
   context_->window->begin(bytesOf(requests_.back()));
 }
 
@@ -47,24 +47,24 @@ void UnixRequests::addFirst(const RpcFrameScanner::Frame& frame, std::string byt
   add(frame, first_, method);
 }
 
-void UnixRequests::deliver() { deliver(*context_->decoder); }
+void UnixRequests::deliver() { deliver(*context_->decoder, context_->handler->shapes()); }
 
 void UnixRequests::deliverAtOnce() {
-  RpcFrameDecoder decoder;  // the shared one may be in use
-  deliver(decoder);
+  RpcFrameDecoder decoder;  // the shared one may be in use, and so may the handler's shapes
+  deliver(decoder, nullptr);
 }
 
-void UnixRequests::deliver(RpcFrameDecoder& decoder) {
+void UnixRequests::deliver(RpcFrameDecoder& decoder, ShapeTable* shapes) {
   while (delivered_ < requests_.size()) {
-    deliver(requests_[delivered_++], decoder);
+    deliver(requests_[delivered_++], decoder, shapes);
     BatchScope::pieceHasRun();
   }
 }
 
-void UnixRequests::deliver(const Request& request, RpcFrameDecoder& decoder) {
+void UnixRequests::deliver(const Request& request, RpcFrameDecoder& decoder, ShapeTable* shapes) {
   InFlightToken token(context_->window, bytesOf(request));
   Reply reply = request.isNotification ? Reply() : Reply(context_->outbox, request.identifier);
-  RpcFrame& frame = decoder.decode(request.bytes);
+  RpcFrame& frame = decoder.decode(request.frame, request.method ? shapes : nullptr);
   if (const auto problem = problemWith(request, frame)) return reply(problem);
   context_->handler->handleRequest(*request.method, std::move(frame.arguments), std::move(reply),
                                    std::move(token));
@@ -83,7 +83,7 @@ std::optional<ReplyError> UnixRequests::problemWith(const Request& request, cons
 }
 
 std::size_t UnixRequests::bytesOf(const Request& request) const {
-  return request.bytes.size() +
+  return request.frame.bytes.size() +
          (request.method ? context_->methods.methods[*request.method].replyBytes : std::size_t{0});
 }
 

@@ -10,15 +10,13 @@
 #include <vector>
 
 #include "platform/RequestHandler.h"
+#include "platform/linux/messagepack/RpcFrameDecoder.h"
 #include "platform/linux/messagepack/RpcFrameScanner.h"
 #include "platform/linux/messaging/RequestWindow.h"
 #include "platform/linux/messaging/Slab.h"
 #include "platform/linux/socket/ReplyOutbox.h"
 
 namespace tonewerk {
-
-class RpcFrameDecoder;
-struct RpcFrame;
 
 // What the requests of one connection share. They may outlive the connection.
 struct UnixRequestContext {
@@ -55,14 +53,14 @@ class UnixRequests final : public ReceivedRequests {
 
  private:
   struct Request {
-    std::string_view bytes;
+    RpcFrameDecoder::Frame frame;
     std::uint32_t identifier;
     bool isNotification;
     std::optional<std::size_t> method;
   };
 
-  void deliver(RpcFrameDecoder& decoder);
-  void deliver(const Request& request, RpcFrameDecoder& decoder);
+  void deliver(RpcFrameDecoder& decoder, ShapeTable* shapes);
+  void deliver(const Request& request, RpcFrameDecoder& decoder, ShapeTable* shapes);
   [[nodiscard]] std::optional<ReplyError> problemWith(const Request& request, const RpcFrame& frame) const;
   // The bytes that the request counts for in the window.
   std::size_t bytesOf(const Request& request) const;
