@@ -34,7 +34,7 @@ StoreRowText::StoreRowText(const RtcMessageRow& row) : text_(emptyText()) {
 }
 
 StoreRowText::~StoreRowText() {
-  if (text_.capacity() > kKeptBytes) text_ = std::string();
+  if (text_.capacity() > kKeptBytes) std::string().swap(text_);  // an assignment may keep the buffer
 }
 
 std::size_t StoreBatch::bytesOf(const AnalyticsRow& /*row*/, const StoreRowText& text) {
@@ -92,11 +92,8 @@ void StoreBatch::clear() {
   names_.clear();
   nameSlots_.fill(0);
   sessions_.clear();
-  if (text_.capacity() > kKeptBytes) {
-    text_ = std::string();
-  } else {
-    text_.clear();
-  }
+  text_.clear();
+  if (text_.capacity() > kKeptBytes) std::string().swap(text_);
   rows_ = 0;
   bytes_ = 0;
 }

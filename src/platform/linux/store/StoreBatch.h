@@ -30,10 +30,12 @@ class StoreRowText {
   ~StoreRowText();
 
   std::string_view view() const { return text_; }
+  // The size of the buffer.
+  std::size_t capacity() const { return text_.capacity(); }
 
- private:
   static constexpr std::size_t kKeptBytes = 64 << 10;
 
+ private:
   std::string& text_;
 };
 
@@ -44,6 +46,9 @@ class StoreRowText {
 // No values are kept, because freeing memory on another thread than it was allocated on is slow.
 class StoreBatch {
  public:
+  // What clear() keeps at most of the text's buffer. Batches of usual rows are smaller.
+  static constexpr std::size_t kKeptBytes = 1 << 20;
+
   // A part of the text.
   struct Part {
     std::size_t begin = 0;
@@ -93,6 +98,8 @@ class StoreBatch {
   // Of all tables.
   std::size_t rows() const { return rows_; }
   std::size_t bytes() const { return bytes_; }
+  // The size of the buffer of the text.
+  std::size_t textCapacity() const { return text_.capacity(); }
 
   std::span<const Analytics> analytics() const { return analytics_; }
   std::span<const Metric> metrics() const { return metrics_; }
@@ -107,8 +114,6 @@ class StoreBatch {
   std::string_view text(Part part) const { return std::string_view(text_).substr(part.begin, part.size); }
 
  private:
-  // Batches of usual rows are smaller.
-  static constexpr std::size_t kKeptBytes = 1 << 20;
   // Where the newest names with a hash are in names_: so the same names are mostly there once.
   static constexpr std::size_t kNameSlots = 256;
 

@@ -155,6 +155,26 @@ TEST(StoreBatchTest, HoldsTextsOfAllSizes) {
   EXPECT_EQ(found, expected);
 }
 
+TEST(StoreBatchTest, KeepsTheBufferOfUsualTextsButNotOfALargeOne) {
+  StoreBatch batch;
+  add(batch, AnalyticsRow{0.0, "a", {{"text", std::string(1000, 'x')}}});
+  batch.clear();
+  EXPECT_GE(batch.textCapacity(), 1000U);
+  add(batch, AnalyticsRow{0.0, "a", {{"text", std::string(StoreBatch::kKeptBytes, 'x')}}});
+  EXPECT_GT(batch.textCapacity(), StoreBatch::kKeptBytes);
+  batch.clear();
+  EXPECT_LT(batch.textCapacity(), 100U);
+}
+
+TEST(StoreBatchTest, ARowsTextKeepsTheBufferOfTheThreadUnlessItIsLarge) {
+  const auto capacityAfter = [](std::size_t size) {
+    { const StoreRowText text(AnalyticsRow{0.0, "a", {{"text", std::string(size, 'x')}}}); }
+    return StoreRowText(AnalyticsRow{0.0, "a", {}}).capacity();
+  };
+  EXPECT_GE(capacityAfter(1000), 1000U);
+  EXPECT_LT(capacityAfter(StoreRowText::kKeptBytes), 100U);
+}
+
 TEST(StoreBatchTest, CountsARowAtItsTextAndASmallRow) {
   StoreBatch batch;
   add(batch, AnalyticsRow{0.0, "a", {{"text", std::string(1000, 'x')}}});
