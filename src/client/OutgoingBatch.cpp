@@ -48,8 +48,8 @@ std::vector<OutgoingFrame> OutgoingBatch::takeBack() {
 }
 
 void OutgoingBatch::clear() {
-  // The memory of a large frame is not kept.
-  if (bytes_.capacity() > 2 * kFullBytes) bytes_ = std::string();
+  // The memory of a large frame is not kept. An assignment could keep it.
+  if (bytes_.capacity() > 2 * kFullBytes) std::string().swap(bytes_);
   bytes_.clear();
   sent_ = 0;
 }

@@ -57,6 +57,19 @@ TEST_F(OutgoingBatchTest, GivesARingsMessageBackWithItsBody) {
   EXPECT_EQ(back[0].command.body, "two");
 }
 
+TEST_F(OutgoingBatchTest, KeepsTheMemoryOfSmallFramesButNotOfALargeOne) {
+  add(std::string(1000, 'x'), 1);
+  EXPECT_EQ(batch.sent(1000).size(), 1U);
+  EXPECT_GE(batch.bytes().capacity(), 1000U);
+  const std::string large(3 * OutgoingBatch::kFullBytes, 'x');
+  add(large, 2);
+  EXPECT_EQ(batch.sent(large.size()).size(), 1U);
+  EXPECT_LT(batch.bytes().capacity(), 100U);
+  add(large, 3);
+  EXPECT_EQ(batch.takeBack().size(), 1U);
+  EXPECT_LT(batch.bytes().capacity(), 100U);
+}
+
 TEST_F(OutgoingBatchTest, IsFullAtItsBound) {
   add(std::string(OutgoingBatch::kFullBytes - 1, 'x'), 1);
   EXPECT_FALSE(batch.isFull());
