@@ -33,9 +33,10 @@ into reports to query, plot, keep on the device or forward: analytics events,
 summaries, metric records, power-log events and JSON files.
 
 It touches no audio, and sends nothing anywhere unless it is told to.")
-# libcurl is loaded at run time, so that the package builder does not find it.
+# libcurl is loaded at run time, so that the package builder does not find it. twctl checks addresses with it.
+set(curl_package "libcurl4 (>= 7.85)")
 set(CPACK_DEBIAN_DAEMON_PACKAGE_DEPENDS
-  "libcurl4 (>= 7.85), systemd | systemd-standalone-sysusers | systemd-sysusers, systemd | systemd-standalone-tmpfiles | systemd-tmpfiles")
+  "${curl_package}, systemd | systemd-standalone-sysusers | systemd-sysusers, systemd | systemd-standalone-tmpfiles | systemd-tmpfiles")
 set(CPACK_DEBIAN_DAEMON_PACKAGE_RECOMMENDS "tonewerk-reporting-tools")
 set(CPACK_DEBIAN_DAEMON_PACKAGE_SUGGESTS "apparmor, dbus, lttng-tools, pipewire-bin, procps")
 set(CPACK_DEBIAN_DAEMON_PACKAGE_CONTROL_EXTRA
@@ -77,7 +78,7 @@ clients do, and replays recordings. tw-pipewire reports what a PipeWire graph
 plays.")
 # The library is built here, so no installed package provides it yet.
 set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS_PRIVATE_DIRS ${PROJECT_BINARY_DIR}/src)
-set(CPACK_DEBIAN_TOOLS_PACKAGE_DEPENDS "libtwreporting0 ${same_version}")
+set(CPACK_DEBIAN_TOOLS_PACKAGE_DEPENDS "libtwreporting0 ${same_version}, ${curl_package}")
 set(CPACK_DEBIAN_TOOLS_PACKAGE_RECOMMENDS "tonewerk-reporting-daemon")
 
 include(CPack)
