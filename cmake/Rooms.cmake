@@ -14,7 +14,12 @@ set(room_library_lttng-ctl PkgConfig::LTTNG_CTL)
 set(room_library_lttng-ust PkgConfig::LTTNG_UST)
 set(room_library_babeltrace PkgConfig::BABELTRACE)
 # Only the headers: the library is loaded when it is first needed.
-set(room_library_curl ${CMAKE_DL_LIBS})
+add_library(tonewerk_curl_headers INTERFACE)
+target_include_directories(tonewerk_curl_headers SYSTEM INTERFACE
+  $<TARGET_PROPERTY:PkgConfig::CURL,INTERFACE_INCLUDE_DIRECTORIES>)
+target_compile_options(tonewerk_curl_headers INTERFACE $<TARGET_PROPERTY:PkgConfig::CURL,INTERFACE_COMPILE_OPTIONS>)
+target_link_libraries(tonewerk_curl_headers INTERFACE ${CMAKE_DL_LIBS})
+set(room_library_curl tonewerk_curl_headers)
 set(room_library_msgpack)
 set(room_library_protozero)
 # The targets that other rooms link in place of these rooms.
