@@ -12,7 +12,8 @@ namespace tonewerk {
 class RingMemory {
  public:
   // From this size on the memory is in huge pages, where the system permits that. With small pages, a thread
-  // that writes through a large ring would wait for an address translation every few messages.
+  // that writes through a large ring would wait for an address translation every few messages. Such memory is
+  // mapped for the ring alone, so that the advice to the kernel does not concern the program's other memory.
   static constexpr std::size_t kHugePageBytes = std::size_t{2} * 1024 * 1024;
 
   // `size` is a power of two.
