@@ -15,8 +15,6 @@ constexpr std::size_t kMaxHeaderBytes = std::size_t{64} << 10;
 constexpr std::string_view kRetryAfter = "retry-after:";
 constexpr int kPollMilliseconds = 1000;
 
-constexpr const char* kNoLibrary = "libcurl is not there";
-
 // Receives an answer up to its size limits.
 struct Receiver {
   HttpAnswer& answer;
@@ -81,16 +79,28 @@ std::string partOf(const CurlLibrary& curl, CURLU* url, CURLUPart part) {
 }  // namespace
 
 struct CurlHttpClient::Handles {
-  Handles() {
-    if (curl == nullptr) return;
-    multi = curl->multiInit();
-    easy = curl->easyInit();
-  }
+  Handles() = default;
   Handles(const Handles&) = delete;
   Handles& operator=(const Handles&) = delete;
   ~Handles() {
     if (easy != nullptr) curl->easyCleanup(easy);
     if (multi != nullptr) curl->multiCleanup(multi);
+  }
+
+  // Makes what is not there yet. Returns false and sets `problem` when that is not possible now.
+  [[nodiscard]] bool prepare(std::string& problem) {
+    if (curl == nullptr) curl = CurlLibrary::get(problem);
+    if (curl == nullptr) return false;
+    if (easy == nullptr) easy = curl->easyInit();
+    if (multi == nullptr) multi = curl->multiInit();
+    if (easy != nullptr && multi != nullptr) return true;
+    problem = "out of memory";
+    return false;
+  }
+
+  // Any thread.
+  void wake() {
+    if (CURLM* const made = multi) curl->multiWakeup(made);
   }
 
   // Returns when the transfer has ended or was cancelled.
@@ -111,9 +121,9 @@ struct CurlHttpClient::Handles {
     return result;
   }
 
-  const CurlLibrary* const curl = CurlLibrary::get();
-  CURLM* multi = nullptr;
+  const CurlLibrary* curl = nullptr;
   CURL* easy = nullptr;
+  std::atomic<CURLM*> multi = nullptr;  // the last to be made, so that wake() finds the library
 };
 
 CurlHttpClient::CurlHttpClient(std::string userAgent) : CurlHttpClient(std::move(userAgent), Timeouts()) {}
@@ -125,16 +135,9 @@ CurlHttpClient::~CurlHttpClient() = default;
 
 HttpAnswer CurlHttpClient::post(const HttpRequest& request) {
   HttpAnswer answer;
-  const CurlLibrary* curl = handles_->curl;
-  if (curl == nullptr) {
-    answer.problem = kNoLibrary;
-    return answer;
-  }
-  CURL* easy = handles_->easy;
-  if (handles_->multi == nullptr || easy == nullptr) {
-    answer.problem = "out of memory";
-    return answer;
-  }
+  if (!handles_->prepare(answer.problem)) return answer;
+  const CurlLibrary* const curl = handles_->curl;
+  CURL* const easy = handles_->easy;
   const HeaderList headers(*curl, request.headers);
   Receiver receiver{answer};
   curl->easyReset(easy);
@@ -166,34 +169,25 @@ HttpAnswer CurlHttpClient::post(const HttpRequest& request) {
 
 void CurlHttpClient::cancel() {
   isCancelled_ = true;
-  if (handles_->multi != nullptr) handles_->curl->multiWakeup(handles_->multi);
+  handles_->wake();
 }
 
-std::string otlpLogsAddressOf(const std::string& base, std::string& problem) {
-  const CurlLibrary* curl = CurlLibrary::get();
-  if (curl == nullptr) {
-    problem = kNoLibrary;
-    return {};
-  }
+OtlpLogsAddress otlpLogsAddressOf(const std::string& base) {
+  std::string unavailable;
+  const CurlLibrary* curl = CurlLibrary::get(unavailable);
+  if (curl == nullptr) return {.problem = unavailable, .isChecked = false};
   const Url url(curl->url(), curl->urlCleanup);
   const CURLUcode parsed = curl->urlSet(url.get(), CURLUPART_URL, base.c_str(), 0);
-  if (parsed != CURLUE_OK) {
-    problem = curl->urlStrerror(parsed);
-    return {};
-  }
+  if (parsed != CURLUE_OK) return {.problem = curl->urlStrerror(parsed)};
   const std::string scheme = partOf(*curl, url.get(), CURLUPART_SCHEME);
-  if (scheme != "http" && scheme != "https") {
-    problem = "it is neither http nor https";
-    return {};
-  }
+  if (scheme != "http" && scheme != "https") return {.problem = "it is neither http nor https"};
   for (const CURLUPart part : {CURLUPART_USER, CURLUPART_PASSWORD, CURLUPART_QUERY, CURLUPART_FRAGMENT}) {
     if (partOf(*curl, url.get(), part).empty()) continue;
-    problem = "it has a user, a query or a fragment";
-    return {};
+    return {.problem = "it has a user, a query or a fragment"};
   }
   std::string address = partOf(*curl, url.get(), CURLUPART_URL);
   while (!address.empty() && address.back() == '/') address.pop_back();
-  return address + "/v1/logs";
+  return {.url = address + "/v1/logs"};
 }
 
 }  // namespace tonewerk

@@ -37,8 +37,14 @@ class CurlHttpClient final : public HttpClient {
   std::atomic<bool> isCancelled_ = false;
 };
 
+struct OtlpLogsAddress {
+  std::string url{};      // empty with a problem
+  std::string problem{};  // why there is none
+  bool isChecked = true;  // false when the base could not be checked, because libcurl could not be loaded
+};
+
 // The URL "<base>/v1/logs" for the base address of an endpoint. The base must be an http or https URL with a
-// host and without user, password, query and fragment; otherwise the result is empty and `problem` says why.
-[[nodiscard]] std::string otlpLogsAddressOf(const std::string& base, std::string& problem);
+// host and without user, password, query and fragment.
+[[nodiscard]] OtlpLogsAddress otlpLogsAddressOf(const std::string& base);
 
 }  // namespace tonewerk

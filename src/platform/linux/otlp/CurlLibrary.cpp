@@ -2,14 +2,15 @@
 #include "platform/linux/otlp/CurlLibrary.h"
 
 #include <dlfcn.h>
-#include <optional>
+
+#include "values/Mutex.h"
 
 namespace tonewerk {
 namespace {
 
 constexpr const char* kName = "libcurl.so.4";
 
-// Finds functions in the library, and remembers whether all of them were there.
+// Finds functions in the library, and remembers the first one that was not there.
 class Finder {
  public:
   explicit Finder(void* library) : library_(library) {}
@@ -17,18 +18,37 @@ class Finder {
   template <class Function>
   void find(Function& function, const char* name) {
     function = reinterpret_cast<Function>(::dlsym(library_, name));
-    hasAll_ = hasAll_ && function != nullptr;
+    if (function == nullptr && missing_ == nullptr) missing_ = name;
   }
-  bool hasAll() const { return hasAll_; }
+  // Null when all were there.
+  const char* missing() const { return missing_; }
 
  private:
   void* library_;
-  bool hasAll_ = true;
+  const char* missing_ = nullptr;
 };
 
-std::optional<CurlLibrary> load() {
-  void* handle = ::dlopen(kName, RTLD_NOW | RTLD_LOCAL | RTLD_NODELETE);
-  if (handle == nullptr) return std::nullopt;
+// The library, once it was loaded.
+struct Loaded {
+  Mutex mutex;
+  std::optional<CurlLibrary> library GUARDED_BY(mutex);
+};
+
+Loaded& loaded() {
+  static Loaded one;
+  return one;
+}
+
+}  // namespace
+
+std::optional<CurlLibrary> CurlLibrary::load(const char* file, std::string& problem) {
+  // It is never unloaded, except when it is the wrong one.
+  void* const handle = ::dlopen(file, RTLD_NOW | RTLD_LOCAL);
+  if (handle == nullptr) {
+    const char* const why = ::dlerror();
+    problem = why != nullptr ? why : std::string(file) + " cannot be loaded";
+    return std::nullopt;
+  }
   CurlLibrary library{};
   decltype(&curl_global_init) globalInit = nullptr;
   Finder finder(handle);
@@ -55,16 +75,24 @@ std::optional<CurlLibrary> load() {
   finder.find(library.urlSet, "curl_url_set");
   finder.find(library.urlStrerror, "curl_url_strerror");
   finder.find(library.free, "curl_free");
+  if (finder.missing() != nullptr) {
+    problem = std::string(file) + " has no " + finder.missing();
+    ::dlclose(handle);
+    return std::nullopt;
+  }
   // The library must be initialised once in the process, before any other use.
-  if (!finder.hasAll() || globalInit(CURL_GLOBAL_DEFAULT) != CURLE_OK) return std::nullopt;
+  if (const CURLcode error = globalInit(CURL_GLOBAL_DEFAULT); error != CURLE_OK) {
+    problem = std::string(file) + " cannot be initialised: " + library.easyStrerror(error);
+    return std::nullopt;
+  }
   return library;
 }
 
-}  // namespace
-
-const CurlLibrary* CurlLibrary::get() {
-  static const std::optional<CurlLibrary> library = load();
-  return library ? &*library : nullptr;
+const CurlLibrary* CurlLibrary::get(std::string& problem) {
+  Loaded& known = loaded();
+  const MutexLock lock(known.mutex);
+  if (!known.library) known.library = load(kName, problem);
+  return known.library ? &*known.library : nullptr;
 }
 
 }  // namespace tonewerk

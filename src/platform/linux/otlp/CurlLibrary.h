@@ -2,6 +2,8 @@
 #pragma once
 
 #include <curl/curl.h>
+#include <optional>
+#include <string>
 
 namespace tonewerk {
 
@@ -31,9 +33,12 @@ struct CurlLibrary {
   decltype(&curl_url_strerror) urlStrerror;
   decltype(&curl_free) free;
 
-  // Loads and initialises the library at the first call; it stays loaded. Null when that is not possible. Any
-  // thread.
-  [[nodiscard]] static const CurlLibrary* get();
+  // Loads and initialises the library, unless an earlier call did; it stays loaded. Where that is not
+  // possible it returns null and sets `problem`, and the next call tries again. Any thread.
+  [[nodiscard]] static const CurlLibrary* get(std::string& problem);
+
+  // Loads and initialises the library `file`. One thread at a time; for get() and tests.
+  [[nodiscard]] static std::optional<CurlLibrary> load(const char* file, std::string& problem);
 };
 
 }  // namespace tonewerk

@@ -38,12 +38,13 @@ void LinkReportBackends::add(const std::string& entry) {
   }
   // An entry with an '@' is not logged, because it may contain a password.
   const std::string shown = entry.find('@') == std::string::npos ? "\"" + entry + "\"" : "an entry";
-  std::string problem;
-  const std::string url = otlpLogsAddressOf(entry, problem);
-  if (url.empty()) {
+  const auto [url, problem, isChecked] = otlpLogsAddressOf(entry);
+  if (!isChecked) {
+    problems.push_back(shown + " cannot be checked: " + problem);
+  } else if (url.empty()) {
     problems.push_back(shown + " is neither \"local\" nor an address: " + problem);
   } else if (std::any_of(endpoints.begin(), endpoints.end(),
-                         [&](const auto& known) { return known.url == url; })) {
+                         [&url = url](const auto& known) { return known.url == url; })) {
     problems.push_back(shown + " is there twice");
   } else if (endpoints.size() == kMaxEndpoints) {
     problems.push_back(shown + " is one address too many");
