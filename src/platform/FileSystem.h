@@ -14,15 +14,17 @@ class NewFile {
  public:
   virtual ~NewFile() = default;
 
-  // Appends all of `text`, or fails. After a failure the file can still be written to, but cannot be placed
-  // any more.
+  // Appends `text`, which may be written only later, with other texts. A failure therefore may concern
+  // earlier texts. It is final: the file cannot be placed any more, and each later write() fails with the
+  // same error (an implementation for tests may let it succeed).
   [[nodiscard]] virtual std::error_code write(std::string_view text) = 0;
 
   // Ends the writing. The file then has `name` in its directory, and name and text are on the disk. Call
   // once; call again only after std::errc::file_exists, which means that something has this name and stays
   // unchanged. Other failures are the first failure of write(), a name that createFile() would refuse, and
-  // errors that the operating system reports only at the end. Where such an error is that the name could not
-  // be brought to the disk, the complete file is nevertheless there.
+  // errors with texts that were not written yet or that the operating system reports only at the end. Where
+  // such an error is that the name could not be brought to the disk, the complete file is nevertheless
+  // there.
   [[nodiscard]] virtual std::error_code place(const std::string& name) = 0;
 };
 

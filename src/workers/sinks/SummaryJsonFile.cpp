@@ -52,6 +52,7 @@ void SummaryJsonFile::openFile() {
   }
   infoLog(TWReportingSummaryLogCategory(), "SummaryJsonFileWorker opened file. action=open file=%@",
           reportPath_);
+  hasLoggedLine_ = false;
   writeLine("[");
 }
 
@@ -67,10 +68,12 @@ std::error_code SummaryJsonFile::withFreeName(
 
 void SummaryJsonFile::writeLine(std::string_view text) {
   if (reportFileHandle_ == nullptr) return;
-  // Only a failure to write the line's end is logged: a disk that refuses the text refuses the end, too, and
-  // each line is then logged once. A file that is not complete does not appear, and closeFile() logs that.
+  // Only a failure to write the line's end is logged: a file that refuses the text refuses the end, too. All
+  // later lines fail with the same error, so that is logged once. The file does not appear then, and
+  // closeFile() logs that.
   static_cast<void>(reportFileHandle_->write(text));
-  if (const std::error_code error = reportFileHandle_->write("\n")) {
+  const std::error_code error = reportFileHandle_->write("\n");
+  if (error && !std::exchange(hasLoggedLine_, true)) {
     errorLog(TWReportingSummaryLogCategory(),
              "SummaryJsonFileWorker failed to write line. action=writeline file=%@ error=\"%@\"", reportPath_,
              error.message());

@@ -32,7 +32,7 @@ class NewFile;
 // "-3" ... before ".json". A message that cannot be written as JSON leaves an empty line, and the array stays
 // valid. A file that could not be written to its end does not appear.
 //
-// A failure is logged, and the rest is still written. Used by one thread at a time.
+// The first line that cannot be written is logged. Used by one thread at a time.
 class SummaryJsonFile {
  public:
   // The file is made with the first message, in `directory`, which is made when it is missing. `name` ends
@@ -65,7 +65,8 @@ class SummaryJsonFile {
   std::size_t nameNumber_ = 1;
   std::string reportPath_;  // empty until the first message
   std::unique_ptr<NewFile> reportFileHandle_;
-  bool hasEntry_ = false;  // whether an entry with a text was written
+  bool hasLoggedLine_ = false;  // that a line of this file could not be written
+  bool hasEntry_ = false;       // whether an entry with a text was written
   std::map<std::string, std::size_t> counts_;
   // By category and type. Categories of the same text share a count.
   std::map<std::pair<AudioEventCategory, AudioEventType>, Kind> kinds_;

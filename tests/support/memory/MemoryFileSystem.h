@@ -36,7 +36,8 @@ class MemoryFileSystem final : public FileSystem {
   // From now on the call fails with `error`; std::errc() makes it succeed again.
   void failCreateDirectories(std::errc error);
   void failCreateFile(std::errc error);
-  // The `nth` write() from now on fails; 1 is the next one. All others succeed.
+  // The `nth` write() from now on fails; 1 is the next one. All others succeed, even for the same file, so
+  // that a test sees what its user does after a single failure. The file cannot be placed.
   void failWrite(int nth, std::errc error);
   // place() then fails also for a file that was written without an error.
   void failPlace(std::errc error);

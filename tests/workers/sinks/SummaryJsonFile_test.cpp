@@ -86,6 +86,18 @@ TEST_F(SummaryJsonFileTest, NanAndBothInfinitiesAtAnyDepthAreLoggedOnceEach) {
                           StartsWith("dataWithJSONObject: ")));
 }
 
+TEST_F(SummaryJsonFileTest, OnlyTheFirstLineThatCannotBeWrittenIsLogged) {
+  SummaryJsonFile file(kDirectory, "a.json");
+  test.files.failWrite(2, std::errc::no_space_on_device);  // the end of "["
+  file.writeMessage(kCategorySetup, kTypeStart, kGood);
+  test.files.failWrite(2, std::errc::no_space_on_device);  // the end of ","
+  file.writeMessage(kCategorySetup, kTypeStart, kGood);
+  file.closeFile();
+  EXPECT_THAT(test.log.textsOf("twru", LogLevel::kError),
+              ElementsAre(StartsWith("SummaryJsonFileWorker failed to write line."),
+                          StartsWith("SummaryJsonFileWorker failed to closed file.")));
+}
+
 TEST_F(SummaryJsonFileTest, AFileThatIsNotClosedDoesNotAppear) {
   {
     SummaryJsonFile file(kDirectory, "a.json");
