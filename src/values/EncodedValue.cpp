@@ -1,9 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "values/EncodedValue.h"
 
+#include <algorithm>
+#include <array>
 #include <bit>
 #include <cassert>
 #include <limits>
+#include <span>
 #include <utility>
 #include <vector>
 
@@ -160,37 +163,91 @@ Value mapOf(EncodedValue map) {
   return values;
 }
 
-EncodedValue find(EncodedValue map, std::string_view wanted) {
-  EncodedValue found;
-  forEachEntry(map, [&](std::string_view key, EncodedValue value) {
-    if (key == wanted) found = value;
-  });
-  return found;
+bool areEqual(const char*& a, const char*& b);
+
+bool areEqualArrays(const char*& a, const char*& b) {
+  const Extent extent = extentAt(a);
+  const Extent other = extentAt(b);
+  if (extent.count != other.count) return false;
+  a += extent.header;
+  b += other.header;
+  for (std::size_t left = extent.count; left > 0; --left) {
+    if (!areEqual(a, b)) return false;
+  }
+  return true;
 }
 
-bool equalArrays(EncodedValue a, EncodedValue b) {
-  const Extent extent = extentAt(b.begin());
-  if (extentAt(a.begin()).count != extent.count) return false;
-  const char* other = b.begin() + extent.header;
-  bool isEqual = true;
-  forEachElement(a, [&](EncodedValue element) {
-    if (!isEqual) return;
-    isEqual = element == EncodedValue(other);
-    other = EncodedValue(other).end();
-  });
-  return isEqual;
+// Returns the text at `at` and goes behind it.
+std::string_view readText(const char*& at) {
+  const std::string_view text = EncodedValue(at).text();
+  at = text.data() + text.size();
+  return text;
+}
+
+struct Entry {
+  std::string_view key;
+  const char* value = nullptr;
+};
+
+// Up to this size, comparing with all keys is faster than sorting them.
+constexpr std::size_t kMaxUnsorted = 16;
+
+// Walks over `b` only once, because its values may be long.
+bool areEqualInAnyOrder(const char*& a, const char*& b, std::size_t count) {
+  std::array<Entry, kMaxUnsorted> few;
+  std::vector<Entry> many(count > kMaxUnsorted ? count : 0);
+  const std::span<Entry> others = many.empty() ? std::span(few).first(count) : std::span(many);
+  for (Entry& entry : others) {
+    entry.key = readText(b);
+    entry.value = b;
+    b = EncodedValue(b).end();
+  }
+  if (!many.empty()) std::ranges::sort(many, {}, &Entry::key);
+  for (std::size_t left = count; left > 0; --left) {
+    const std::string_view key = readText(a);
+    const auto found = many.empty() ? std::ranges::find(others, key, &Entry::key)
+                                    : std::ranges::lower_bound(others, key, {}, &Entry::key);
+    if (found == others.end() || found->key != key) return false;
+    const char* value = found->value;
+    if (!areEqual(a, value)) return false;
+  }
+  return true;
 }
 
 // The keys of each map differ, so maps of one size have the same keys when one has those of the other.
-bool equalMaps(EncodedValue a, EncodedValue b) {
-  if (extentAt(a.begin()).count != extentAt(b.begin()).count) return false;
-  bool isEqual = true;
-  forEachEntry(a, [&](std::string_view key, EncodedValue value) {
-    if (!isEqual) return;
-    const EncodedValue other = find(b, key);
-    isEqual = other && other == value;
-  });
-  return isEqual;
+bool areEqualMaps(const char*& a, const char*& b) {
+  const Extent extent = extentAt(a);
+  const Extent other = extentAt(b);
+  if (extent.count != other.count) return false;
+  a += extent.header;
+  b += other.header;
+  for (std::size_t left = extent.count; left > 0; --left) {
+    const std::string_view key = EncodedValue(a).text();
+    const std::string_view otherKey = EncodedValue(b).text();
+    if (key != otherKey) return areEqualInAnyOrder(a, b, left);
+    a = key.data() + key.size();
+    b = otherKey.data() + otherKey.size();
+    if (!areEqual(a, b)) return false;
+  }
+  return true;
+}
+
+// Goes behind both values when they are equal, so that nobody has to look for their ends again; else stops
+// at some place inside.
+bool areEqual(const char*& a, const char*& b) {
+  const std::uint8_t first = byteAt(a);
+  const std::uint8_t other = byteAt(b);
+  if (encoding::isText(first) || encoding::isText(other))
+    return encoding::isText(first) && encoding::isText(other) && readText(a) == readText(b);
+  if (isArray(first) || isArray(other)) return isArray(first) && isArray(other) && areEqualArrays(a, b);
+  if (isMap(first) || isMap(other)) return isMap(first) && isMap(other) && areEqualMaps(a, b);
+  const EncodedValue value(a);
+  const EncodedValue another(b);
+  a = value.end();
+  b = another.end();
+  const bool areIntegers = value.isNumber() && first == other && first != kFloat32 && first != kFloat64;
+  if (areIntegers) return std::equal(value.begin(), a, another.begin());  // of one form
+  return value.scalar() == another.scalar();
 }
 
 void appendBigEndian(std::string& out, Byte first, std::uint64_t number, std::size_t bytes) {
@@ -292,16 +349,9 @@ Value EncodedValue::value() const {
 }
 
 bool operator==(EncodedValue a, EncodedValue b) {
-  if (a.isText() || b.isText()) return a.isText() && b.isText() && a.text() == b.text();
-  if (a.isNumber() && a.first() == b.first() && a.first() != kFloat32 && a.first() != kFloat64)
-    return a.bytes() == b.bytes();  // integers of one form
-  const Value::Kind kind = a.kind();
-  if (kind == Value::Kind::kArray || kind == Value::Kind::kMap) {
-    if (b.kind() != kind) return false;
-    return kind == Value::Kind::kArray ? equalArrays(a, b) : equalMaps(a, b);
-  }
-  const Value::Kind other = b.kind();
-  return other != Value::Kind::kArray && other != Value::Kind::kMap && a.scalar() == b.scalar();
+  const char* at = a.begin();
+  const char* other = b.begin();
+  return areEqual(at, other);
 }
 
 bool appendEncoded(std::string& out, const Value& value) {

@@ -117,5 +117,75 @@ TEST(EncodedValueTest, ReadsTheThreeFormsOfADate) {
   EXPECT_FALSE(encoding::dateOf("\xFF\xFF\xFF\xFF\0\0\0\0"sv));
 }
 
+std::string textOf(std::string_view text) { return encoded(Value(text)); }
+
+// A map whose keys count up, or down. The key with the highest number has `lastValue`.
+std::string numberedMap(int count, bool isBackwards, std::string_view lastValue) {
+  std::string bytes{'\xDE', '\0', static_cast<char>(count)};
+  for (int at = 0; at < count; ++at) {
+    const int key = isBackwards ? count - 1 - at : at;
+    bytes += textOf("key" + std::to_string(key));
+    bytes += key == count - 1 ? std::string(lastValue) : encoded(Value(key));
+  }
+  return bytes;
+}
+
+bool areEqual(const std::string& a, const std::string& b) {
+  const bool isEqual = EncodedValue(a.data()) == EncodedValue(b.data());
+  EXPECT_EQ(EncodedValue(b.data()) == EncodedValue(a.data()), isEqual);
+  EXPECT_EQ(EncodedValue(a.data()).value() == EncodedValue(b.data()).value(), isEqual);
+  return isEqual;
+}
+
+TEST(EncodedValueTest, ComparesMapsInAnyOrder) {
+  for (const int count : {1, 2, 16, 17, 200}) {
+    const std::string map = numberedMap(count, false, "\x91\x05");
+    EXPECT_TRUE(areEqual(map, numberedMap(count, false, "\x91\x05"))) << count;
+    EXPECT_TRUE(areEqual(map, numberedMap(count, true, "\x91\x05"))) << count;
+    EXPECT_FALSE(areEqual(map, numberedMap(count, true, "\x91\x06"))) << count;
+    EXPECT_FALSE(areEqual(map, numberedMap(count, false, "\x91\x06"))) << count;
+    EXPECT_FALSE(areEqual(map, numberedMap(count + 1, true, "\x91\x05")));
+  }
+  EXPECT_FALSE(
+      areEqual("\x82\xA1"
+               "a\x01\xA1"
+               "b\x02",
+               "\x82\xA1"
+               "a\x01\xA1"
+               "c\x02"));
+  EXPECT_FALSE(
+      areEqual("\x81\xA1"
+               "a\x01",
+               "\x91\x01"));
+}
+
+TEST(EncodedValueTest, ComparesNumbersByTheirValues) {
+  using namespace std::literals;
+  EXPECT_TRUE(areEqual("\x92\x05\x07", "\x92\xCC\x05\xCD\0\x07"s));
+  EXPECT_TRUE(areEqual("\x91\x02", "\x91\xCA\x40\0\0\0"s));
+  EXPECT_FALSE(areEqual("\x91\xCC\x05", "\x91\xCC\x06"));
+  EXPECT_FALSE(areEqual("\x91\xCA\x7F\xC0\0\0"s, "\x91\x05"));
+  EXPECT_FALSE(areEqual("\x05",
+                        "\xA1"
+                        "5"));
+}
+
+// Each level holds 16 keys in one order or the other, the innermost a long array. Who looks for each key from
+// the start of the map walks over the array 16 times on each level.
+TEST(EncodedValueTest, ComparesDeeplyNestedMapsInOneWalkForEachLevel) {
+  const auto nested = [](bool isBackwards) {
+    std::string value{'\xDD', '\0', '\0', '\xC3', '\x50'};
+    value.append(50'000, '\x01');
+    for (int level = 0; level < 29; ++level) value = numberedMap(16, isBackwards, value);
+    return value;
+  };
+  const std::string forwards = nested(false);
+  const std::string same = nested(false);
+  const std::string backwards = nested(true);
+  EXPECT_TRUE(EncodedValue(forwards.data()) == EncodedValue(same.data()));
+  EXPECT_TRUE(EncodedValue(forwards.data()) == EncodedValue(backwards.data()));
+  EXPECT_TRUE(EncodedValue(backwards.data()) == EncodedValue(forwards.data()));
+}
+
 }  // namespace
 }  // namespace tonewerk
