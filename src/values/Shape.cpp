@@ -14,6 +14,9 @@ namespace {
 // Up to this size, walking over the keys is faster than a hash probe.
 constexpr std::size_t kMaxWithoutIndex = 16;
 
+// Returns at least what a text of this size takes with its header.
+std::size_t wireBytesOf(std::size_t size) { return size + (size < 32 ? 1 : 5); }
+
 }  // namespace
 
 Counted<const Shape> Shape::make(std::vector<SharedString> keys, KnownKeys known, Origin origin) {
@@ -67,6 +70,8 @@ void Shape::complete(KnownKeys known) {
   });
   variables_ = static_cast<std::size_t>(std::count_if(
       slots_.begin(), slots_.end(), [](const Slot& slot) { return slot.constant == kVariable; }));
+  wireBytes_ = constants_.size();
+  for (const Slot& slot : slots_) wireBytes_ += wireBytesOf(slot.key.size());
   known_.fill(kUnknown);
   for (std::size_t at = 0; at < known.size(); ++at) known_[at] = static_cast<std::uint32_t>(find(known[at]));
 }

@@ -71,6 +71,8 @@ class Shape {
   }
   // How many slots are not constant.
   std::size_t variables() const { return variables_; }
+  // Returns an upper bound of the bytes that the keys and the constants take in MessagePack. O(1).
+  std::size_t wireBytes() const { return wireBytes_; }
   bool hasKeyWithSpace() const { return hasKeyWithSpace_; }
   bool hasDoubledKey() const { return hasDoubledKey_; }
 
@@ -105,6 +107,7 @@ class Shape {
   bool hasDoubledKey_ = false;
   std::array<std::uint32_t, kMaxKnownKeys> known_{};
   std::size_t variables_ = 0;
+  std::size_t wireBytes_ = 0;
   std::vector<Slot> slots_;
   std::string json_;
   std::string constants_;              // encoded, one after the other

@@ -115,21 +115,24 @@ ShapeTable::Place ShapeTable::add(Place from, std::string_view key) {
 }
 
 const Shape* ShapeTable::makeShape(Place place) {
-  if (isFull_) return nullptr;
+  if (isFull() || at(place).isRefused) return nullptr;
   std::vector<SharedString> keys(at(place).depth);
   auto node = static_cast<std::uint32_t>(place);
   for (std::size_t left = keys.size(); left > 0; --left, node = nodes_[node].parent)
     keys[left - 1] = nodes_[node].key;
   const Shape* shape =
       intern({Shape::make(std::move(keys), known_, nextOrigin()), static_cast<std::uint32_t>(place), 0, {}});
-  if (shape != nullptr) at(place).shape = Counted<const Shape>(*shape);
+  if (shape == nullptr) {
+    at(place).isRefused = true;
+  } else {
+    at(place).shape = Counted<const Shape>(*shape);
+  }
   return shape;
 }
 
 const Shape* ShapeTable::intern(Interned interned) {
   const std::size_t bytes = sizeof(Interned) + interned.shape->bytes() + bytesOf(interned.constants);
-  isFull_ = shapes_.size() >= kMaxShapes || bytes_ + bytes > kMaxBytes;
-  if (isFull_) return nullptr;
+  if (isFull() || bytes > kMaxBytes - bytes_) return nullptr;
   bytes_ += bytes;
   shapes_.push_back(std::move(interned));
   return shapes_.back().shape.get();
@@ -160,7 +163,9 @@ const Shape* ShapeTable::extended(const Shape& shape, std::span<const ValueMapEn
 
 const Shape* ShapeTable::makeExtended(const Shape& shape, std::span<const ValueMapEntry> constants,
                                       std::size_t hash) {
-  if (isFull_) return nullptr;
+  // An extended shape is no smaller than its base.
+  const std::size_t least = sizeof(Interned) + shape.bytes() + bytesOf(constants);
+  if (isFull() || least > kMaxBytes - bytes_) return nullptr;
   Counted<const Shape> made = shape.extended(constants, known_, nextOrigin());
   if (!made) return nullptr;
   const Shape* kept = intern({std::move(made), kNoNode, 0, {constants.begin(), constants.end()}});

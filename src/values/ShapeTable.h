@@ -23,16 +23,20 @@ namespace tonewerk {
 // A walk expects the key that came next last time, so for a repeated message each key costs one comparison;
 // any other costs a hash probe, however many keys may follow.
 //
-// It never grows beyond its limits and forgets nothing: at a limit it answers "none" to what is new, and
-// still finds the rest. So make one for each client. One thread; its shapes may live longer, and on any
-// thread.
+// It forgets nothing, and answers "none" to what is new and beyond a limit; it still finds the rest. So make
+// one for each client. One thread; its shapes may live longer, and on any thread.
+//
+// A limit is for the table's whole life. When the shapes or the keys are used up, no new one is ever made;
+// known keys still get shapes. The bytes refuse only what does not fit: a large shape may be refused, and a
+// smaller one made after it. A message without a shape is kept as a tree, which costs more time and memory.
 class ShapeTable {
  public:
   static constexpr std::size_t kMaxShapes = 1024;
   // The most keys of all sequences together, where a common beginning counts once, and of one sequence.
   static constexpr std::size_t kMaxKeys = 8192;
   static constexpr std::size_t kMaxKeysOfShape = 1024;
-  // The most bytes of all keys and shapes together.
+  // The most bytes of all keys and shapes together. They count as bytes() does: without unused room in
+  // vectors and hash tables and without what the heap adds, which can be twice as much again for short keys.
   static constexpr std::size_t kMaxBytes = std::size_t{1} << 20U;
 
   // A place in the tree: the keys on the way to it are the beginning of a sequence.
@@ -92,6 +96,7 @@ class ShapeTable {
     std::uint32_t guess = 0;  // the node that a walk from here went to last; 0 for none
     std::uint32_t parent = 0;
     std::uint32_t depth = 0;
+    bool isRefused = false;  // its shape has no room, and never will have
     SharedString key;
     Counted<const Shape> shape;  // null until a sequence has ended here
   };
@@ -123,6 +128,10 @@ class ShapeTable {
     std::size_t used_ = 0;
   };
 
+  // True when not even the smallest shape has room.
+  bool isFull() const {
+    return shapes_.size() >= kMaxShapes || kMaxBytes - bytes_ < sizeof(Interned) + sizeof(Shape);
+  }
   Node& at(Place place) { return nodes_[static_cast<std::size_t>(place)]; }
   Place probe(Place from, std::string_view key);
   const Shape* makeShape(Place place);
@@ -142,7 +151,6 @@ class ShapeTable {
   std::vector<Interned> shapes_;  // in the order of their numbers, from 1
   Index extensions_;
   std::size_t bytes_ = 0;
-  bool isFull_ = false;  // a shape was refused; no further one is made, because making it only to see is slow
 };
 
 }  // namespace tonewerk

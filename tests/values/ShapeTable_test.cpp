@@ -206,6 +206,43 @@ TEST(ShapeTableTest, HoldsNoMoreBytesThanItsLimit) {
   EXPECT_EQ(shapeOf(table, {"kept"}), kept);
 }
 
+TEST(ShapeTableTest, RefusesOnlyTheShapeThatIsTooLarge) {
+  ShapeTable table;
+  const Shape* shape = shapeOf(table, {"a"});
+  const std::string longKey(ShapeTable::kMaxBytes / 3, 'x');
+  ASSERT_NE(table.next(ShapeTable::root(), longKey), ShapeTable::none());
+  EXPECT_EQ(shapeOf(table, {longKey, "b"}), nullptr);
+  EXPECT_EQ(shapeOf(table, {longKey, "b"}), nullptr);
+  EXPECT_EQ(table.extended(*shape, {{"tag", std::string(ShapeTable::kMaxBytes, 'x')}}), nullptr);
+  EXPECT_NE(shapeOf(table, {"b"}), nullptr);
+  EXPECT_NE(table.extended(*shape, {{"tag", "text"}}), nullptr);
+  EXPECT_LE(table.bytes(), ShapeTable::kMaxBytes);
+}
+
+TEST(ShapeTableTest, BoundsTheBytesOfKeysAndConstantsOnTheWire) {
+  ShapeTable table;
+  const auto onTheWire = [](const Shape& shape) {
+    std::string bytes;
+    for (std::size_t slot = 0; slot < shape.size(); ++slot) {
+      EXPECT_TRUE(appendEncoded(bytes, Value(shape.key(slot))));
+      if (shape.isConstant(slot)) bytes += shape.constant(slot).bytes();
+    }
+    return bytes.size();
+  };
+  EXPECT_EQ(shapeOf(table, {})->wireBytes(), 0U);
+  for (const std::size_t size : {0U, 1U, 31U, 32U, 255U, 256U, 65535U, 65536U}) {
+    const Shape* shape = shapeOf(table, {"a", std::string(size, 'k')});
+    ASSERT_NE(shape, nullptr) << size;
+    EXPECT_GE(shape->wireBytes(), onTheWire(*shape)) << size;
+    EXPECT_LE(shape->wireBytes(), onTheWire(*shape) + 4) << size;
+    const Shape* extended =
+        table.extended(*shape, {{"a", std::string(size, 'v')}, {"real", 0.5}, {"truth", true}});
+    ASSERT_NE(extended, nullptr) << size;
+    EXPECT_GE(extended->wireBytes(), onTheWire(*extended)) << size;
+    EXPECT_LE(extended->wireBytes(), onTheWire(*extended) + 4) << size;
+  }
+}
+
 TEST(ShapeTableTest, FindsOneOfManyKeysThatMayFollow) {
   ShapeTable table;
   std::vector<Place> places;
