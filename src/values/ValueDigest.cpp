@@ -7,6 +7,7 @@
 #include <cstring>
 #include <string_view>
 
+#include "values/ForEach.h"
 #include "values/Mix.h"
 #include "values/Value.h"
 
@@ -38,8 +39,10 @@ class Digester {
     state_.second = mix(state_.second ^ word, keys().factor.second);
   }
   void add(Tag tag) { add(static_cast<std::uint64_t>(tag)); }
-  void add(const Value& value);
-  void add(const ValueMap& map);
+  void add(ValueView value);
+  // Calls visitEntries(visit) to visit all `size` entries.
+  template <typename VisitEntries>
+  void addMap(std::size_t size, VisitEntries&& visitEntries);
 
   const ValueDigest& state() const { return state_; }
 
@@ -85,44 +88,45 @@ void Digester::addInstant(Date date) {
 }
 
 // Digests each entry separately and adds the digests, so that the order does not matter.
-void Digester::add(const ValueMap& map) {
+template <typename VisitEntries>
+void Digester::addMap(std::size_t size, VisitEntries&& visitEntries) {
   ValueDigest sum;
-  for (const ValueMapEntry& entry : map) {
+  visitEntries([&](std::string_view key, ValueView value) {
     Digester one;
-    one.addText(entry.key.view());
-    one.add(entry.value);
+    one.addText(key);
+    one.add(value);
     sum.first += one.state().first;
     sum.second += one.state().second;
-  }
+  });
   add(Tag::kMap);
-  add(map.size());
+  add(size);
   add(sum.first);
   add(sum.second);
 }
 
-void Digester::add(const Value& value) {
+void Digester::add(ValueView value) {
   switch (value.kind()) {
     case Value::Kind::kBoolean:
-      return addWhole(*value.asBoolean() ? 1 : 0);
+      return addWhole(value.boolean() ? 1 : 0);
     case Value::Kind::kInteger:
-      return addWhole(*value.asInteger());
+      return addWhole(value.integer());
     case Value::Kind::kUnsigned:
       add(Tag::kWhole);
-      return add(*value.asUnsigned());
+      return add(*value.value().asUnsigned());
     case Value::Kind::kDouble:
-      return addNumber(*value.asDouble());
+      return addNumber(value.number());
     case Value::Kind::kString:
       add(Tag::kString);
-      return addText(value.asString()->view());
+      return addText(*value.asText());
     case Value::Kind::kDate:
-      return addInstant(*value.asDate());
+      return addInstant(*value.value().asDate());
     case Value::Kind::kArray:
       add(Tag::kArray);
-      add(value.asArray()->size());
-      for (const Value& element : *value.asArray()) add(element);
+      add(sizeOf(value));
+      forEachElement(value, [this](ValueView element) { add(element); });
       return;
     case Value::Kind::kMap:
-      return add(*value.asMap());
+      return addMap(sizeOf(value), [&](auto&& visit) { forEachEntry(value, visit); });
   }
 }
 
@@ -130,7 +134,9 @@ void Digester::add(const Value& value) {
 
 ValueDigest ValueDigest::of(const ValueMap& map) {
   Digester digester;
-  digester.add(map);
+  digester.addMap(map.size(), [&](auto&& visit) {
+    map.forEach([&](const SharedString& key, ValueView value) { visit(key.view(), value); });
+  });
   return digester.state();
 }
 

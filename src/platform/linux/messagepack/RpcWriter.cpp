@@ -5,6 +5,7 @@
 
 #include "platform/linux/messagepack/RpcLimits.h"
 #include "platform/linux/messagepack/RpcPacker.h"
+#include "values/ForEach.h"
 #include "values/Nesting.h"
 
 namespace tonewerk {
@@ -14,31 +15,20 @@ class ValuePacker : public RpcPacker<StringOutput> {
  public:
   using RpcPacker::RpcPacker;
 
-  void value(const Value& value) {
+  // Writes encoded values in this protocol's form, too: clients may have used longer ones.
+  void value(ValueView value) {
     switch (value.kind()) {
-      case Value::Kind::kBoolean:
-        pack(*value.asBoolean());
-        return;
-      case Value::Kind::kInteger:
-        pack_int64(*value.asInteger());
-        return;
-      case Value::Kind::kUnsigned:
-        pack_uint64(*value.asUnsigned());
-        return;
-      case Value::Kind::kDouble:
-        number(*value.asDouble());
-        return;
       case Value::Kind::kString:
-        text(*value.asString());
-        return;
-      case Value::Kind::kDate:
-        date(*value.asDate());
+        text(*value.asText());
         return;
       case Value::Kind::kArray:
-        array(*value.asArray());
+        array(value);
         return;
       case Value::Kind::kMap:
-        map(*value.asMap());
+        map(value);
+        return;
+      default:
+        scalar(value.value());
         return;
     }
   }
@@ -68,17 +58,41 @@ class ValuePacker : public RpcPacker<StringOutput> {
   }
 
  private:
-  void array(const ValueArray& array) {
-    pack_array(static_cast<std::uint32_t>(array.size()));
-    for (const Value& element : array) value(element);
+  void scalar(const Value& value) {
+    switch (value.kind()) {
+      case Value::Kind::kBoolean:
+        pack(*value.asBoolean());
+        return;
+      case Value::Kind::kInteger:
+        pack_int64(*value.asInteger());
+        return;
+      case Value::Kind::kUnsigned:
+        pack_uint64(*value.asUnsigned());
+        return;
+      case Value::Kind::kDouble:
+        number(*value.asDouble());
+        return;
+      case Value::Kind::kDate:
+        date(*value.asDate());
+        return;
+      case Value::Kind::kString:
+      case Value::Kind::kArray:
+      case Value::Kind::kMap:
+        return;  // no scalar
+    }
   }
 
-  void map(const ValueMap& map) {
-    pack_map(static_cast<std::uint32_t>(map.size()));
-    for (const ValueMapEntry& entry : map) {
-      text(entry.key);
-      value(entry.value);
-    }
+  void array(ValueView array) {
+    pack_array(static_cast<std::uint32_t>(sizeOf(array)));
+    forEachElement(array, [this](ValueView element) { value(element); });
+  }
+
+  void map(ValueView map) {
+    pack_map(static_cast<std::uint32_t>(sizeOf(map)));
+    forEachEntry(map, [this](std::string_view key, ValueView held) {
+      text(key);
+      value(held);
+    });
   }
 };
 

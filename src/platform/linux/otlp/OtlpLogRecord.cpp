@@ -5,8 +5,10 @@
 #include <array>
 #include <cmath>
 #include <limits>
+#include <utility>
 
 #include "values/CompactJson.h"
+#include "values/ForEach.h"
 
 namespace tonewerk {
 namespace {
@@ -32,9 +34,9 @@ void appendDouble(std::string& out, double number) {
   }
 }
 
-void appendAnyValue(std::string& out, const Value& value);
+void appendAnyValue(std::string& out, ValueView value);
 
-void appendKeyValue(std::string& out, std::string_view key, const Value& value) {
+void appendKeyValue(std::string& out, std::string_view key, ValueView value) {
   out += R"({"key":)";
   appendText(out, key);
   out += R"(,"value":)";
@@ -42,21 +44,23 @@ void appendKeyValue(std::string& out, std::string_view key, const Value& value) 
   out += '}';
 }
 
-void appendArray(std::string& out, const ValueArray& array) {
+void appendArray(std::string& out, ValueView array) {
   out += R"("arrayValue":{"values":[)";
-  for (const Value& element : array) {
-    if (&element != array.begin()) out += ',';
+  const char* separator = "";
+  forEachElement(array, [&](ValueView element) {
+    out += std::exchange(separator, ",");
     appendAnyValue(out, element);
-  }
+  });
   out += "]}";
 }
 
-void appendMap(std::string& out, const ValueMap& map) {
+void appendMap(std::string& out, ValueView map) {
   out += R"("kvlistValue":{"values":[)";
-  for (const ValueMap::Entry& entry : map) {
-    if (&entry != map.begin()) out += ',';
-    appendKeyValue(out, entry.key, entry.value);
-  }
+  const char* separator = "";
+  forEachEntry(map, [&](std::string_view key, ValueView value) {
+    out += std::exchange(separator, ",");
+    appendKeyValue(out, key, value);
+  });
   out += "]}";
 }
 
@@ -66,21 +70,21 @@ void appendUnsigned(std::string& out, std::uint64_t number) {
   out += std::to_string(number) + '"';
 }
 
-void appendAnyValue(std::string& out, const Value& value) {
+void appendAnyValue(std::string& out, ValueView value) {
   out += '{';
   switch (value.kind()) {
     case Value::Kind::kBoolean:
-      out += *value.asBoolean() ? R"("boolValue":true)" : R"("boolValue":false)";
+      out += value.boolean() ? R"("boolValue":true)" : R"("boolValue":false)";
       break;
     case Value::Kind::kInteger:
-      out += R"("intValue":")" + std::to_string(*value.asInteger()) + '"';
+      out += R"("intValue":")" + std::to_string(value.integer()) + '"';
       break;
     case Value::Kind::kUnsigned:
-      appendUnsigned(out, *value.asUnsigned());
+      appendUnsigned(out, *value.value().asUnsigned());
       break;
     case Value::Kind::kDouble:
       out += R"("doubleValue":)";
-      appendDouble(out, *value.asDouble());
+      appendDouble(out, value.number());
       break;
     case Value::Kind::kString:
     case Value::Kind::kDate:
@@ -88,10 +92,10 @@ void appendAnyValue(std::string& out, const Value& value) {
       appendCompactJson(out, value);
       break;
     case Value::Kind::kArray:
-      appendArray(out, *value.asArray());
+      appendArray(out, value);
       break;
     case Value::Kind::kMap:
-      appendMap(out, *value.asMap());
+      appendMap(out, value);
       break;
   }
   out += '}';
@@ -101,13 +105,13 @@ void appendAnyValue(std::string& out, const Value& value) {
 class Attributes {
  public:
   explicit Attributes(std::string& out) : out_(out) { out_ += R"("attributes":[)"; }
-  void add(std::string_view key, const Value& value) {
+  void add(std::string_view key, ValueView value) {
     if (!isFirst_) out_ += ',';
     isFirst_ = false;
     appendKeyValue(out_, key, value);
   }
   void addUnlessEmpty(std::string_view key, const std::string& text) {
-    if (!text.empty()) add(key, text);
+    if (!text.empty()) add(key, Value(text));
   }
   void end() { out_ += ']'; }
 
@@ -123,13 +127,13 @@ bool isReserved(std::string_view key) {
 // Returns how many entries were left out.
 std::size_t addPayload(Attributes& attributes, const ValueMap& payload) {
   std::size_t leftOut = 0;
-  for (const ValueMap::Entry& entry : payload) {
-    if (entry.key.empty() || isReserved(entry.key)) {
+  payload.forEach([&](const SharedString& key, ValueView value) {
+    if (key.empty() || isReserved(key)) {
       ++leftOut;
     } else {
-      attributes.add(entry.key, entry.value);
+      attributes.add(key, value);
     }
-  }
+  });
   return leftOut;
 }
 
@@ -150,11 +154,11 @@ std::string otlpJsonOf(const OtlpLogRecord& record) {
   appendText(out, record.eventName);
   out += ',';
   Attributes attributes(out);
-  attributes.add(kSessionKey, std::to_string(record.sessionIdentifier));
-  attributes.add(kCategoryKey, static_cast<std::int64_t>(record.category));
-  attributes.add(kTypeKey, static_cast<std::int64_t>(record.type));
-  attributes.add(kIdentifierKey, record.identifier);
-  if (record.repeatsEventName) attributes.add(kEventNameKey, record.eventName);
+  attributes.add(kSessionKey, Value(std::to_string(record.sessionIdentifier)));
+  attributes.add(kCategoryKey, Value(static_cast<std::int64_t>(record.category)));
+  attributes.add(kTypeKey, Value(static_cast<std::int64_t>(record.type)));
+  attributes.add(kIdentifierKey, Value(record.identifier));
+  if (record.repeatsEventName) attributes.add(kEventNameKey, Value(record.eventName));
   const std::size_t leftOut = addPayload(attributes, record.payload);
   attributes.end();
   if (leftOut > 0) out += R"(,"droppedAttributesCount":)" + std::to_string(leftOut);
@@ -165,8 +169,8 @@ std::string otlpJsonOf(const OtlpLogRecord& record) {
 std::string otlpRequestOf(const OtlpResource& resource, std::span<const std::string> records) {
   std::string out = R"({"resourceLogs":[{"resource":{)";
   Attributes attributes(out);
-  attributes.add("service.name", resource.serviceName);
-  attributes.add("service.version", resource.serviceVersion);
+  attributes.add("service.name", Value(resource.serviceName));
+  attributes.add("service.version", Value(resource.serviceVersion));
   attributes.addUnlessEmpty("host.id", resource.hostIdentifier);
   attributes.addUnlessEmpty("device.id", resource.deviceIdentifier);
   attributes.end();
