@@ -50,7 +50,7 @@ std::string bytesOf(const ValueMap& map) {
 std::string frameOf(std::string_view map) { return std::string("\x94\x00\x01\xA1m\x91", 6).append(map); }
 
 ValueMap packed(const ValueMap& map, ShapeTable& shapes) {
-  return PackedMapReader(shapes).read(bytesOf(map)).map;
+  return PackedMapReader().read(bytesOf(map), shapes).map;
 }
 
 void readTree(benchmark::State& state, const ValueMap& map) {
@@ -69,10 +69,10 @@ void readTree(benchmark::State& state, const ValueMap& map) {
 void readPacked(benchmark::State& state, const ValueMap& map) {
   const std::string bytes = bytesOf(map);
   ShapeTable shapes;
-  PackedMapReader reader(shapes);
-  for (auto _ : state) benchmark::DoNotOptimize(reader.read(bytes));
+  PackedMapReader reader;
+  for (auto _ : state) benchmark::DoNotOptimize(reader.read(bytes, shapes));
   state.counters["wire"] = static_cast<double>(bytes.size());
-  state.counters["bytes"] = static_cast<double>(reader.read(bytes).map.bytes());
+  state.counters["bytes"] = static_cast<double>(reader.read(bytes, shapes).map.bytes());
 }
 
 void ReadTree(benchmark::State& state) { readTree(state, message()); }
@@ -117,11 +117,11 @@ void ReadNewKeysPackedFirst(benchmark::State& state) {
   RpcStrings texts;
   RpcFrameReader reader(texts);
   ShapeTable shapes;
-  PackedMapReader packedReader(shapes);
+  PackedMapReader packedReader;
   std::size_t at = 0;
   for (auto _ : state) {
     const std::size_t place = at++ % frames.size();
-    PackedMapReader::Read read = packedReader.read(maps[place]);
+    PackedMapReader::Read read = packedReader.read(maps[place], shapes);
     benchmark::DoNotOptimize(read);
     if (read.result == PackedMapReader::Result::kPacked) continue;
     std::string_view rest = frames[place];
@@ -192,10 +192,10 @@ BENCHMARK(MergePackedIntoTree);
 void ReadAndExtend(benchmark::State& state) {
   const std::string bytes = bytesOf(message());
   ShapeTable shapes;
-  PackedMapReader reader(shapes);
+  PackedMapReader reader;
   const std::vector<ValueMapEntry> constants = {{"audio_tag", "playback_generic"}, {"application", "player"}};
   for (auto _ : state) {
-    ValueMap map = reader.read(bytes).map;
+    ValueMap map = reader.read(bytes, shapes).map;
     benchmark::DoNotOptimize(map.extend(*shapes.extended(*map.shape(), constants)));
   }
 }
@@ -206,11 +206,11 @@ void ReadAndSetTime(benchmark::State& state) {
   timeless.erase("twreporting_timestamp");
   const std::string bytes = bytesOf(timeless);
   ShapeTable shapes;
-  PackedMapReader reader(shapes);
+  PackedMapReader reader;
   const Value nil("(null)");
   const Value now(1790000001.5);
   for (auto _ : state) {
-    ValueMap map = reader.read(bytes).map;
+    ValueMap map = reader.read(bytes, shapes).map;
     benchmark::DoNotOptimize(
         map.setPacked({{"invalid_timestamp", nil}, {"twreporting_timestamp", now}}, shapes));
   }

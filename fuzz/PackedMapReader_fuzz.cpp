@@ -44,8 +44,8 @@ void read(std::string_view bytes) {
   constexpr std::size_t kFrameAndArguments = 2;
   const encoding::Scanned scanned = encoding::scan(bytes, kMaxFrameDepth - kFrameAndArguments);
   ShapeTable shapes;
-  PackedMapReader packedReader(shapes);
-  const PackedMapReader::Read read = packedReader.read(bytes);
+  PackedMapReader packedReader;
+  const PackedMapReader::Read read = packedReader.read(bytes, shapes);
 
   const std::string frame = std::string("\x94\x00\x01\xA1m\x91", 6).append(bytes);
   RpcStrings texts;

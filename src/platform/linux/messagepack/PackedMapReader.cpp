@@ -22,8 +22,8 @@ using encoding::byteAt;
 constexpr std::size_t kKeptBytes = std::size_t{64} * 1024;
 // How far copyValue() may write behind a value.
 constexpr std::size_t kOvershoot = 16;
-// The frame's own array and that of the arguments are around every argument.
-constexpr std::size_t kArgumentLevels = kMaxFrameDepth - 2;
+// The deepest value lies in the frame's array, that of the arguments, the map, and an array or a map inside.
+static_assert(kMaxFrameDepth >= 4);
 
 // Checks values, one after the other. After the first problem it stands still.
 class Checker {
@@ -41,8 +41,8 @@ class Checker {
   std::optional<std::string_view> key();
   // Checks that a key's characters are allowed.
   bool isValidKey(std::string_view key);
-  // Goes behind the next value, which may hold this many levels of arrays and maps. False after a problem.
-  bool value(std::size_t levels);
+  // Goes behind the next value. False after a problem, and for an array or a map that is left to a tree.
+  bool value();
 
  private:
   std::size_t left() const { return static_cast<std::size_t>(end_ - at_); }
@@ -54,10 +54,12 @@ class Checker {
   std::optional<std::string_view> body();
   // The same for a text, most of which are short.
   std::optional<std::string_view> textBody();
+  // The same as value(), but for no array and no map.
+  bool leaf();
   bool text();
   bool extension();
-  bool array(std::size_t levels);
-  bool map(std::size_t levels);
+  bool array();
+  bool map();
 
   const char* at_;
   const char* const end_;
@@ -95,8 +97,7 @@ std::optional<std::string_view> Checker::key() {
   const std::uint8_t first = byteAt(at_);
   if (encoding::isText(first)) return textBody();
   // An array or a map has problems of its own, which come first.
-  if (!encoding::isArray(first) && !encoding::isMap(first) && value(0))
-    refuse("has a key that is not a text");
+  if (!encoding::isArray(first) && !encoding::isMap(first) && leaf()) refuse("has a key that is not a text");
   return std::nullopt;
 }
 
@@ -105,7 +106,15 @@ bool Checker::isValidKey(std::string_view key) {
   return refuse(isUtf8(key) ? "has a key with a noncharacter" : "has a key that is not UTF-8");
 }
 
-bool Checker::value(std::size_t levels) {
+bool Checker::value() {
+  if (isAtEnd()) return false;
+  const std::uint8_t first = byteAt(at_);
+  if (encoding::isArray(first)) return array();
+  if (encoding::isMap(first)) return map();
+  return leaf();
+}
+
+bool Checker::leaf() {
   if (isAtEnd()) return false;
   const std::uint8_t first = byteAt(at_);
   if (const std::size_t length = encoding::kNumberLengths[first]) {
@@ -114,8 +123,6 @@ bool Checker::value(std::size_t levels) {
     return true;
   }
   if (encoding::isText(first)) return text();
-  if (encoding::isArray(first)) return array(levels);
-  if (encoding::isMap(first)) return map(levels);
   if (encoding::isExtension(first)) return extension();
   if (encoding::isBinary(first)) return refuse("holds binary data");
   return first == encoding::kNil && refuse("holds nil");
@@ -136,18 +143,16 @@ bool Checker::extension() {
   return dateOfTimestamp(*extension) || refuse("holds a malformed date");
 }
 
-bool Checker::array(std::size_t levels) {
-  if (levels == 0) return false;
+bool Checker::array() {
   const std::optional<std::size_t> elements = count();
-  if (!elements) return false;
+  if (!elements || *elements > PackedMapReader::kMaxNestedElements) return false;
   for (std::size_t left = *elements; left > 0; --left) {
-    if (!value(levels - 1)) return false;
+    if (!leaf()) return false;
   }
   return true;
 }
 
-bool Checker::map(std::size_t levels) {
-  if (levels == 0) return false;
+bool Checker::map() {
   const std::optional<std::size_t> entries = count();
   if (!entries || *entries > PackedMapReader::kMaxNestedKeys) return false;
   std::array<std::string_view, PackedMapReader::kMaxNestedKeys> keys;
@@ -158,7 +163,7 @@ bool Checker::map(std::size_t levels) {
       if (keys[earlier] == *next) return false;
     }
     keys[place] = *next;
-    if (!value(levels - 1)) return false;
+    if (!leaf()) return false;
   }
   return true;
 }
@@ -174,7 +179,13 @@ char* copyValue(char* to, const char* from, std::size_t size, std::string_view b
 
 }  // namespace
 
-PackedMapReader::Read PackedMapReader::read(std::string_view bytes, PackedChunk* chunk) {
+PackedMapReader::Read PackedMapReader::read(std::string_view bytes, ShapeTable& shapes, PackedChunk* chunk) {
+  Read read = pack(bytes, shapes, chunk);
+  if (values_.size() > kKeptBytes) values_ = {};
+  return read;
+}
+
+PackedMapReader::Read PackedMapReader::pack(std::string_view bytes, ShapeTable& shapes, PackedChunk* chunk) {
   Checker checker(bytes);
   const auto stopped = [&] {
     const bool isRefused = checker.refused() != nullptr;
@@ -189,24 +200,22 @@ PackedMapReader::Read PackedMapReader::read(std::string_view bytes, PackedChunk*
   for (std::size_t left = *entries; left > 0; --left) {
     const std::optional<std::string_view> key = checker.key();
     if (!key) return stopped();
-    ShapeTable::Place next = shapes_.find(place, *key);
+    ShapeTable::Place next = shapes.find(place, *key);
     if (next == ShapeTable::none()) {
       if (!checker.isValidKey(*key)) return stopped();
-      next = shapes_.add(place, *key);
+      next = shapes.add(place, *key);
       if (next == ShapeTable::none()) return {};
     }
     place = next;
     const char* const value = checker.at();
-    if (!checker.value(kArgumentLevels - 1)) return stopped();
+    if (!checker.value()) return stopped();
     end = copyValue(end, value, static_cast<std::size_t>(checker.at() - value), bytes);
   }
   if (!checker.isAtEnd()) return {};
-  const Shape* shape = shapes_.shapeAt(place);
+  const Shape* shape = shapes.shapeAt(place);
   if (shape == nullptr || shape->hasDoubledKey()) return {};
   const std::string_view values(values_.data(), static_cast<std::size_t>(end - values_.data()));
-  Read packed{Result::kPacked, ValueMap(PackedMap::make(*shape, values, chunk)), ""};
-  if (values_.size() > kKeptBytes) values_ = {};
-  return packed;
+  return {Result::kPacked, ValueMap(PackedMap::make(*shape, values, chunk)), ""};
 }
 
 }  // namespace tonewerk

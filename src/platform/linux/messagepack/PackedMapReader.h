@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <cstddef>
 #include <string_view>
 #include <vector>
 
@@ -14,13 +15,14 @@ namespace tonewerk {
 // checks the values and copies their bytes. It accepts what RpcFrameVisitor accepts, and refuses the rest
 // with the same words; some maps it leaves to that.
 //
-// One thread, that of the table.
+// It keeps room for values from one map to the next. One thread, that of the table.
 class PackedMapReader {
  public:
   enum class Result {
     kPacked,
     kRefused,  // the first value that the protocol does not allow is named by `refused`
-    kTree      // not for a packed map: a doubled key, a large map inside, or no room in the table
+    kTree      // not for a packed map: a doubled key, large or nested arrays or maps inside, or no room in
+               // the table
   };
   struct Read {
     Result result = Result::kTree;
@@ -30,16 +32,17 @@ class PackedMapReader {
 
   // The most keys of a map inside the map. Whether two of them are the same is found by comparing all pairs.
   static constexpr std::size_t kMaxNestedKeys = 16;
+  // The most elements of an array inside the map. With this limit, and because arrays and maps inside hold no
+  // further ones, the tree that find() may make beside the bytes is not many times larger than they are.
+  static constexpr std::size_t kMaxNestedElements = 64;
 
-  // `shapes` outlives the reader.
-  explicit PackedMapReader(ShapeTable& shapes) : shapes_(shapes) {}
-
-  // Takes exactly one encoded map, nested no deeper than an argument may be; other bytes
-  // give kTree. The map lies in `chunk`, if it has room.
-  [[nodiscard]] Read read(std::string_view bytes, PackedChunk* chunk = nullptr);
+  // Takes exactly one encoded map; other bytes give kTree. Its shape comes from `shapes`. The map lies in
+  // `chunk`, if it has room.
+  [[nodiscard]] Read read(std::string_view bytes, ShapeTable& shapes, PackedChunk* chunk = nullptr);
 
  private:
-  ShapeTable& shapes_;
+  Read pack(std::string_view bytes, ShapeTable& shapes, PackedChunk* chunk);
+
   std::vector<char> values_;
 };
 

@@ -6,7 +6,6 @@
 #include <utility>
 #include <vector>
 
-#include "platform/linux/messagepack/PackedMapReader.h"
 #include "values/EncodedValue.h"
 #include "values/ShapeTable.h"
 
@@ -33,7 +32,10 @@ bool RpcFrameDecoder::decodePacked(const Frame& frame, ShapeTable& shapes) {
   for (std::size_t index = 0; index < count; ++index) {
     const std::size_t begin = frame.arguments[index];
     const std::size_t end = index + 1 < count ? frame.arguments[index + 1] : frame.bytes.size();
-    if (!addArgument(frame.bytes.substr(begin, end - begin), shapes)) return false;
+    if (!addArgument(frame.bytes.substr(begin, end - begin), shapes)) {
+      packed_.arguments.clear();  // which would hold memory until the next packed frame
+      return false;
+    }
   }
   return true;
 }
@@ -42,7 +44,7 @@ bool RpcFrameDecoder::addArgument(std::string_view bytes, ShapeTable& shapes) {
   const std::uint8_t first = encoding::byteAt(bytes.data());
   const EncodedValue value(bytes.data());
   if (encoding::isMap(first)) {
-    PackedMapReader::Read read = PackedMapReader(shapes).read(bytes);
+    PackedMapReader::Read read = reader_.read(bytes, shapes);
     if (read.result == PackedMapReader::Result::kTree) return false;
     if (read.result == PackedMapReader::Result::kRefused && !packed_.refused) {
       packed_.refused = RefusedValue{packed_.arguments.size(), read.refused};

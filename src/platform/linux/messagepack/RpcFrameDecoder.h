@@ -7,6 +7,7 @@
 #include <optional>
 #include <string_view>
 
+#include "platform/linux/messagepack/PackedMapReader.h"
 #include "platform/linux/messagepack/RpcFrameReader.h"
 #include "platform/linux/messagepack/RpcFrameScanner.h"
 #include "platform/linux/messagepack/RpcFrameVisitor.h"
@@ -42,6 +43,7 @@ class RpcFrameDecoder {
 
   RpcStrings texts_;
   RpcFrameVisitor visitor_{texts_};
+  PackedMapReader reader_;
   RpcFrame packed_;
 };
 
