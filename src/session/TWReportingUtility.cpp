@@ -11,6 +11,7 @@
 #include "platform/SystemInformation.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingKeys.h"
+#include "values/ValueView.h"
 
 namespace tonewerk {
 namespace {
@@ -88,10 +89,11 @@ bool TWReportingUtilityKeyIsPresentAndHasChanged(std::string_view key, const Val
 }
 
 SharedString TWReportingUtilityRetrieveAppName(const ValueMap& configuration) {
-  const Value* name = configuration.find(TWReportingApplicationName);
-  if (name == nullptr) return "Unknown";
-  if (const SharedString* text = name->asString()) return *text;
-  return name->text();
+  const ValueView name = configuration.view(TWReportingApplicationName);
+  if (!name) return "Unknown";
+  const Value* held = name.held();
+  if (held != nullptr && held->asString() != nullptr) return *held->asString();
+  return name.text();
 }
 
 bool TWReportingUtilityWait(TWReportingCondition& condition, double timeoutSeconds, const bool* flag,

@@ -8,6 +8,7 @@
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionMessage.h"
 #include "session/TWReportingUtility.h"
+#include "values/ValueView.h"
 #include "workers/diagnostics/TWReportingSessionCapsaWorker.h"
 #include "workers/diagnostics/WorkerInstanceState.h"
 
@@ -51,8 +52,8 @@ bool TWReportingCapsaWorkerInstanceAlarmLowRMS::interestedInMessage(
   const auto session = session_.lock();
   if (session == nullptr) return false;
   if (session->serviceType() != kServiceAlarms && session->serviceType() != kServiceTest) return false;
-  const Value* issue = message.message.find(kIssueTypeKey);
-  return issue != nullptr && *issue == kLowRms;
+  const ValueView issue = message.message.view(kIssueTypeKey);
+  return issue && issue == ValueView(kLowRms);
 }
 
 void TWReportingCapsaWorkerInstanceAlarmLowRMS::fire(const TWReportingSessionMessage& message) {

@@ -55,9 +55,11 @@ void requestTrace(const TWReportingSessionMessage& message) {
   const Platform& platform = TWReportingContext::current().platform();
   platform.clock.sleep(settings().waitTime);
   ValueMap payload = message.message;  // later changes of the message do not reach it
+  const ValueView application = payload.view(TWReportingApplicationName);
+  const Value* noName = nullptr;
   infoLog(TWReportingDPLogCategory(), "Dropping whirlcap %@", message);
   platform.whirlcaps.request("com.orvane.tonewerk", "AudioOverloads",
-                             textOf(payload.find(TWReportingApplicationName)), payload,
+                             application ? application.text() : textOf(noName), payload,
                              {.first = true, .second = true});
   if (const std::error_code error = platform.notifications.post(kDroppedWhirlcapNotification)) {
     errorLog(TWReportingDPLogCategory(), "cannot post %@: %@", kDroppedWhirlcapNotification, error.message());

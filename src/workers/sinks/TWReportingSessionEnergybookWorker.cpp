@@ -11,6 +11,7 @@
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingUtility.h"
+#include "values/ValueView.h"
 
 namespace tonewerk {
 namespace {
@@ -54,17 +55,17 @@ bool TWReportingSessionEnergybookWorker::handleMessage(const TWReportingSessionM
 }
 
 void TWReportingSessionEnergybookWorker::handleEngineOnDurationMessage(const ValueMap& message) const {
-  const Value* engineOnTime = message.find(kEngineOnTime);
-  if (engineOnTime == nullptr) return;
-  ValueMap payload{{kEngineOnDuration, *engineOnTime}};
+  const ValueView engineOnTime = message.view(kEngineOnTime);
+  if (!engineOnTime) return;
+  ValueMap payload{{kEngineOnDuration, engineOnTime.value()}};
   const SharedString application = applicationName();
   if (application != kUnknownApplication) {
     payload.set(kApplicationName, application);
   } else {
     errorLog(TWReportingEnergybookCategory(), "failed to get app name for energybook");
   }
-  if (const Value* timestamp = message.find(TWReportingMessageKeyTWTimestamp)) {
-    payload.set(kTimestampEnd, *timestamp);
+  if (const ValueView timestamp = message.view(TWReportingMessageKeyTWTimestamp)) {
+    payload.set(kTimestampEnd, timestamp.value());
   } else {
     errorLog(TWReportingEnergybookCategory(), "failed to get TWReporting timestamp for energybook");
   }
@@ -72,21 +73,21 @@ void TWReportingSessionEnergybookWorker::handleEngineOnDurationMessage(const Val
 }
 
 void TWReportingSessionEnergybookWorker::handleEngineStateMessage(const ValueMap& message) const {
-  const Value* engineState = message.find(kEngineState);
-  if (engineState == nullptr) return;
+  const ValueView engineState = message.view(kEngineState);
+  if (!engineState) return;
   // Unlike for a duration, an unknown application is sent as such, and missing values are not logged.
-  ValueMap payload{{kStatus, *engineState == kEngineOn}, {kApplicationName, applicationName()}};
-  if (const Value* timestamp = message.find(TWReportingMessageKeyTWTimestamp)) {
-    payload.set(kTimestampEnd, *timestamp);
+  ValueMap payload{{kStatus, engineState == ValueView(kEngineOn)}, {kApplicationName, applicationName()}};
+  if (const ValueView timestamp = message.view(TWReportingMessageKeyTWTimestamp)) {
+    payload.set(kTimestampEnd, timestamp.value());
   }
   send(kClientStatusEvent, std::move(payload));
 }
 
 void TWReportingSessionEnergybookWorker::handleLongRunningMessage(const ValueMap& message) {
-  const Value* activeTime = message.find(kActiveHardwareTime);
-  if (activeTime == nullptr) return;
-  ValueMap payload{{kActiveHardwareTime, *activeTime}};
-  if (const Value* clients = message.find(kActiveClients)) payload.set(kActiveClients, *clients);
+  const ValueView activeTime = message.view(kActiveHardwareTime);
+  if (!activeTime) return;
+  ValueMap payload{{kActiveHardwareTime, activeTime.value()}};
+  if (const ValueView clients = message.view(kActiveClients)) payload.set(kActiveClients, clients.value());
   send(kLeakedSessionEvent, std::move(payload));
 }
 
