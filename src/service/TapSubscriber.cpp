@@ -13,6 +13,7 @@
 #include "session/TWReportingSessionMessage.h"
 #include "session/TWReportingUtility.h"
 #include "values/Nesting.h"
+#include "values/Shape.h"
 
 namespace tonewerk {
 
@@ -93,6 +94,12 @@ ValueMap TapSubscriber::takeAnswer() {
     messages.emplace_back(oldest.toValue());
   }
   return {{kWatchKeyMissed, std::exchange(missed_, 0)}, {kWatchKeyMessages, ValueArray(std::move(messages))}};
+}
+
+// A packed map shares its keys with others, but an answer has them.
+std::size_t TapSubscriber::SeenMessage::bytes() const {
+  const Shape* shape = payload.shape();
+  return kRecordBytes + payload.bytes() + (shape == nullptr ? 0 : shape->wireBytes());
 }
 
 ValueMap TapSubscriber::SeenMessage::toValue() const {

@@ -60,7 +60,8 @@ class TapSubscriber final : public std::enable_shared_from_this<TapSubscriber> {
     bool isRedundant;
     ValueMap payload;
 
-    std::size_t bytes() const { return kRecordBytes + payload.bytes(); }
+    // An upper bound of what the message takes in an answer.
+    std::size_t bytes() const;
     ValueMap toValue() const;
   };
 

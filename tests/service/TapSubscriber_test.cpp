@@ -6,6 +6,7 @@
 #include <utility>
 #include <vector>
 
+#include "support/PackedMaps.h"
 #include "support/ReportingTest.h"
 
 namespace tonewerk {
@@ -211,6 +212,18 @@ TEST_F(TapSubscriberTest, MissesAMessageLargerThanAnAnswer) {
   const ValueMap answer = next();
   EXPECT_EQ(answer.integer("missed"), 1);
   EXPECT_THAT(numbersIn(answer), ElementsAre(1));
+}
+
+// The keys of packed messages are in their shape, which all of them share. In an answer each has its own.
+TEST_F(TapSubscriberTest, CountsTheKeysOfPackedMessages) {
+  ShapeTable shapes;
+  const std::string key(100'000, 'k');
+  for (int number = 1; number <= 5; ++number) {
+    offer(packedMapOf({{"number", number}, {key + "1", true}, {key + "2", true}}, shapes));
+  }
+  EXPECT_THAT(numbersIn(next()), ElementsAre(1, 2));
+  EXPECT_THAT(numbersIn(next()), ElementsAre(3, 4));
+  EXPECT_THAT(numbersIn(next()), ElementsAre(5));
 }
 
 TEST_F(TapSubscriberTest, MissesAPayloadThatIsNestedTooDeepForAnAnswer) {
