@@ -166,7 +166,7 @@ void TWReportingServiceExport::handleReceived(std::unique_ptr<ReceivedRequests> 
 bool TWReportingServiceExport::isUrgent(std::size_t method) {
   const std::string_view name = requests::kAll[method].name;
   if (name == requests::kObserve.name) hasAskedToObserve_ = true;
-  return name == requests::kKillService.name && !hasAskedToObserve_;
+  return name == requests::kKillService.name && (!hasAskedToObserve_ || role_ == Role::kClient);
 }
 
 void TWReportingServiceExport::handleRequest(std::size_t method, Arguments arguments, Reply reply,

@@ -32,8 +32,8 @@ class TWReportingServiceExport final : public RequestHandler {
   // Has the work queue deliver the requests, so that no value is made on one thread and freed on another.
   void handleReceived(std::unique_ptr<ReceivedRequests> requests) override;
   ShapeTable* shapes() override { return shapes_.get(); }
-  // True for the request to end the process, which does not wait for the work queue. But once the connection
-  // has asked to be an onlooker, the answer to that comes first.
+  // True for the request to end the process, which does not wait for the work queue. But when the connection
+  // has asked to be an onlooker and may be one by now, the answer to that comes first.
   bool isUrgent(std::size_t method) override;
 
  private:

@@ -37,6 +37,12 @@ TEST_F(TWReportingServiceExportTest, TheRequestToEndTheProcessWaitsForAnEarlierO
   EXPECT_FALSE(object->isUrgent(indexOf(requests::kKillService)));
 }
 
+TEST_F(TWReportingServiceExportTest, AClientsRequestToEndTheProcessIsUrgentAlsoAfterARefusedOneToObserve) {
+  object->handleRequest(indexOf(requests::kCreateReportingSession), {Value(77)}, {}, {});
+  EXPECT_FALSE(object->isUrgent(indexOf(requests::kObserve)));
+  EXPECT_TRUE(object->isUrgent(indexOf(requests::kKillService)));
+}
+
 TEST_F(TWReportingServiceExportTest, HasTheWorkQueueDeliverWhatWasReceived) {
   class Received final : public ReceivedRequests {
    public:
