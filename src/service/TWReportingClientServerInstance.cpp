@@ -94,13 +94,12 @@ void TWReportingClientServerInstance::changeServiceType(AudioServiceType service
                                                         const Session& session) {
   if (session->serviceType() == serviceType) return session->setServiceType(serviceType);
   const ValueMap configuration = session->configuration();
-  const ValueMap previousValues = session->previousValues();
   // Comes first, so that the budget has room for the new session's copies, however full it is.
   session->leaveBudget();
   const Session replacement = makeSession(session->reporterID());
   // It fits, because the old session has left the budget.
   (void)replacement->updateConfigurationWithContentsOfConfiguration(&configuration);
-  replacement->addPreviousValues(previousValues);
+  replacement->takePreviousValuesOf(*session);
   replacement->setServiceType(serviceType);
   setSession(session->reporterID(), replacement);
 }

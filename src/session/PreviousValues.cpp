@@ -23,12 +23,12 @@ bool PreviousValues::add(const ValueMap& values, KeptBytesBudget& budget) {
   const Shape* shape = values.shape();
   Latest* latest = shape == nullptr ? nullptr : latestOf(*shape);
   if (latest != nullptr) return replace(*latest, values, budget);
-  const bool hasMerged = mergeAll(budget);
-  if (!mergeWithin(budget, merged_, values)) return false;
+  // First, so that later values replace earlier ones.
+  if (!mergeAll(budget) || !mergeWithin(budget, merged_, values)) return false;
   if (shape != nullptr && latest_.size() < kMaxShapes) {
     latest_.push_back({Counted<const Shape>(*shape), {}, 0});
   }
-  return hasMerged;
+  return true;
 }
 
 ValueMap PreviousValues::merged() const {
@@ -57,14 +57,14 @@ bool PreviousValues::replace(Latest& latest, const ValueMap& values, KeptBytesBu
 }
 
 bool PreviousValues::mergeAll(KeptBytesBudget& budget) {
-  bool fits = true;
   for (const std::size_t at : unmerged()) {
-    const ValueMap values = std::exchange(latest_[at].values, {});
+    ValueMap& values = latest_[at].values;
+    if (!mergeWithin(budget, merged_, values)) return false;
     budget.give(values.bytes());
     keptBytes_ -= values.bytes();
-    fits = mergeWithin(budget, merged_, values) && fits;
+    values = {};
   }
-  return fits;
+  return true;
 }
 
 std::vector<std::size_t> PreviousValues::unmerged() const {

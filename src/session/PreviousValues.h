@@ -17,13 +17,15 @@ class Shape;
 //
 // Merging every message costs more than everything else that a session does with it. So of messages with one
 // shape only the newest is kept, which has all their keys, and they are merged when somebody asks. A shape's
-// first message and messages without a shape are merged at once; thus the keys are in order.
+// first message and messages without a shape are merged at once; thus the keys are in order. A copy has taken
+// nothing from a budget.
 class PreviousValues {
  public:
   // Of more shapes no message is kept: theirs are merged at once.
   static constexpr std::size_t kMaxShapes = 64;
 
-  // Takes over `values`. Returns false, and changes nothing, when the budget has no room for them.
+  // Takes over `values`. Returns false, and loses nothing that it took over before, when the budget has no room
+  // for them.
   [[nodiscard]] bool add(const ValueMap& values, KeptBytesBudget& budget);
 
   // Returns a new map with everything.
@@ -42,7 +44,8 @@ class PreviousValues {
   // Null for a shape of which no message is kept.
   Latest* latestOf(const Shape& shape);
   [[nodiscard]] bool replace(Latest& latest, const ValueMap& values, KeptBytesBudget& budget);
-  // Merges the messages that are kept. Returns false when the budget had no room for all of them.
+  // Merges the messages that are kept, in order. Returns false, and keeps the rest, when the budget has no room
+  // for what they become.
   [[nodiscard]] bool mergeAll(KeptBytesBudget& budget);
   // The messages that are not merged, in order of arrival.
   std::vector<std::size_t> unmerged() const;

@@ -7,6 +7,7 @@
 
 #include "platform/Clock.h"
 #include "platform/Log.h"
+#include "session/MessageShapes.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingTracePoint.h"
@@ -31,6 +32,12 @@ const SharedString kMethod("method");
 const SharedString kReporterID("reporterid");
 
 std::string_view yesOrNo(bool answer) { return answer ? "YES" : "NO"; }
+
+// The value of a key that the shape of a packed map knows.
+ValueView knownValue(const ValueMap& packed, std::size_t known) {
+  const std::size_t slot = packed.shape()->known(known);
+  return slot == Shape::kNoSlot ? ValueView() : ValueView(packed.packed()->at(slot));
+}
 
 // What takes the place of a message's time.
 struct ReplacedDate {
@@ -369,8 +376,10 @@ void TWReportingSession::forgetMessages() {
 
 bool TWReportingSession::completePacked(TWReportingSessionMessage& message) const {
   const Shape* shape = message.message.shape();
-  if (shape == nullptr || shapes_ == nullptr || shape->hasKeyWithSpace()) return false;
-  if (const auto replaced = replacedDate(message.message.view(TWReportingInternalEventEpochTime))) {
+  // A shape of another client does not know these keys.
+  if (shape == nullptr || shapes_ == nullptr || !shapes_->owns(*shape) || shape->hasKeyWithSpace())
+    return false;
+  if (const auto replaced = replacedDate(knownValue(message.message, kKnownTimestamp))) {
     const Value now = replaced->now;
     if (!message.message.setPacked({{TWReportingInternalEventInvalidTimestamp, replaced->invalid},
                                     {TWReportingInternalEventEpochTime, now}},
@@ -382,7 +391,7 @@ bool TWReportingSession::completePacked(TWReportingSessionMessage& message) cons
   const std::lock_guard lock(message);
   const ValueMapEntry tag{TWReportingInternalEventAudioTag,
                           TWReportingContext::current().names().audioTag(message.category, message.type)};
-  const ValueView name = message.message.view(TWReportingApplicationName);
+  const ValueView name = knownValue(message.message, kKnownApplicationName);
   const Shape* complete =
       name && !(name == ValueView(kUnknownName))
           ? shapes_->extended(*shape, {tag})
@@ -468,6 +477,20 @@ void TWReportingSession::addPreviousValues(const ValueMap& values) {
     if (previousValues_.add(values, *budget_)) return;
   }
   logFullBudgetOnce();
+}
+
+void TWReportingSession::takePreviousValuesOf(const TWReportingSession& other) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
+  PreviousValues values;
+  {
+    const MutexLock lock(other.propertiesMutex_);
+    values = other.previousValues_;
+  }
+  const MutexLock lock(propertiesMutex_);
+  budget_->give(previousValues_.bytes());
+  previousValues_ = std::move(values);
+  [[maybe_unused]] const bool fits = budget_->take(previousValues_.bytes());
+  assert(fits);
 }
 
 std::size_t TWReportingSession::workerInstanceCount() const {

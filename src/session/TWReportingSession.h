@@ -104,6 +104,9 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   // The latest value of every key received.
   ValueMap previousValues() const;
   void addPreviousValues(const ValueMap& values);
+  // Takes over the previous values of `other`, a session of the same client that has left the budget, in place
+  // of its own. They fit, because `other` took them from the same budget.
+  void takePreviousValuesOf(const TWReportingSession& other);
   // Moves the bytes that the session keeps out of the client's budget. For a session that the client has
   // given up but that may live on.
   void leaveBudget();

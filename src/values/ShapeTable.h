@@ -84,6 +84,9 @@ class ShapeTable {
     return extended(shape, std::span(constants.begin(), constants.size()));
   }
 
+  // Whether the shape is interned here, so that it knows the keys of this table.
+  bool owns(const Shape& shape) const { return shape.origin().table == identifier_; }
+
   std::size_t shapes() const { return shapes_.size(); }
   std::size_t keys() const { return nodes_.size() - 1; }
   std::size_t bytes() const { return bytes_; }

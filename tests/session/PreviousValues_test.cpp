@@ -6,27 +6,14 @@
 #include <string>
 #include <vector>
 
-#include "values/EncodedValue.h"
-#include "values/ShapeTable.h"
-#include "values/ValueView.h"
+#include "support/PackedMaps.h"
 
 namespace tonewerk {
 namespace {
 
 class PreviousValuesTest : public testing::Test {
  protected:
-  // Returns a packed map.
-  ValueMap packed(const std::vector<ValueMapEntry>& entries) {
-    ShapeTable::Place place = ShapeTable::root();
-    std::string bytes;
-    for (const ValueMapEntry& entry : entries) {
-      place = shapes.next(place, entry.key);
-      EXPECT_TRUE(appendEncoded(bytes, entry.value));
-    }
-    ValueMap map(PackedMap::make(*shapes.shapeAt(place), bytes));
-    EXPECT_NE(map.packed(), nullptr);
-    return map;
-  }
+  ValueMap packed(const std::vector<ValueMapEntry>& entries) { return packedMapOf(entries, shapes); }
 
   ShapeTable shapes;
   KeptBytesBudget budget;
@@ -61,13 +48,31 @@ TEST_F(PreviousValuesTest, WhatDoesNotFitChangesNothing) {
   EXPECT_EQ(values.merged().text(), R"({"a":1})");
 }
 
+TEST_F(PreviousValuesTest, AFullBudgetLosesNothingThatWasTakenBefore) {
+  const std::string text(100, 'x');
+  EXPECT_TRUE(values.add(packed({{"a", 1}, {"b", "short"}}), budget));
+  EXPECT_TRUE(values.add(packed({{"a", 2}, {"b", text}}), budget));
+  ASSERT_TRUE(budget.take(budget.limit() - budget.used() - 10));
+  // A new shape: the latest values would become a tree first, for which there is no room.
+  EXPECT_FALSE(values.add(packed({{"c", 3}}), budget));
+  EXPECT_EQ(values.merged().text(), R"({"a":2,"b":")" + text + R"("})");
+}
+
+TEST_F(PreviousValuesTest, ACopyHoldsTheSame) {
+  EXPECT_TRUE(values.add(packed({{"a", 1}}), budget));
+  EXPECT_TRUE(values.add(packed({{"a", 2}}), budget));
+  const PreviousValues copy = values;
+  EXPECT_EQ(copy.bytes(), values.bytes());
+  EXPECT_EQ(copy.merged().text(), R"({"a":2})");
+}
+
 // Also more shapes than are kept apart.
 TEST_F(PreviousValuesTest, AgreesWithMergingEachMessage) {
   std::mt19937 random(7);
   ValueMap plain;
-  const auto below = [&random](unsigned limit) { return random() % limit; };
+  const auto below = [&random](std::size_t limit) { return static_cast<unsigned>(random() % limit); };
   for (int step = 0; step < 20'000; ++step) {
-    const unsigned shape = below(step % 1000 < 500 ? 8U : 2U * PreviousValues::kMaxShapes);
+    const unsigned shape = below(step % 1000 < 500 ? 8 : 2 * PreviousValues::kMaxShapes);
     std::vector<ValueMapEntry> entries;
     for (unsigned key = 0; key < 1 + shape % 5; ++key) {
       const Value value = below(3) == 0 ? Value(std::string(below(20), 'x')) : Value(below(100));
