@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Measures the cost of a session's life without messages: created, started, stopped and destroyed. Once in the
+// Measures the cost of a session's life without messages: created, started, stopped, destroyed. Once in the
 // core on in-memory doubles, and once for the daemon, through its socket and with its own adapters.
 
 #include <algorithm>

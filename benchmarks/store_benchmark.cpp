@@ -110,7 +110,7 @@ double threadNanoseconds() {
   return static_cast<double>(time.tv_sec) * 1e9 + static_cast<double>(time.tv_nsec);
 }
 
-// Events through the analytics service, as fast as the store takes them. The counter is the recording thread's
+// Events through the analytics service, as fast as the store takes them. The counter is the recorder's
 // part.
 void RecordEvents(benchmark::State& state) {
   Store store;

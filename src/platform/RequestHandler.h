@@ -98,7 +98,7 @@ class RequestHandler {
   // in the order of these calls. A transport that decodes on its own thread calls handleRequest() instead.
   virtual void handleReceived(std::unique_ptr<ReceivedRequests> requests) { requests->deliver(); }
 
-  // The table for the shapes of maps among the arguments; null when they are to be trees. Asked for, and used,
+  // The table for the shapes of maps among the arguments; null when they are to be trees. Asked for and used
   // on the thread that delivers.
   virtual ShapeTable* shapes() { return nullptr; }
 

@@ -83,7 +83,7 @@ class TWReportingClientServerInstance final
   // The shapes of this client's messages. The table is used on the work queue.
   const std::shared_ptr<ShapeTable>& shapes() const { return shapes_; }
 
-  // From now on keeps the client's sessions in `index`, under `number`. Called once, before the first request.
+  // From now on keeps the client's sessions in `index`, under `number`. Call it once, before any request.
   void listSessionsIn(std::shared_ptr<SessionIndex> index, SessionIndex::ClientNumber number);
 
  private:

@@ -24,7 +24,7 @@ class PreviousValues {
   // Of more shapes no message is kept: theirs are merged at once.
   static constexpr std::size_t kMaxShapes = 64;
 
-  // Takes over `values`. Returns false, and loses nothing that it took over before, when the budget has no room
+  // Takes over `values`. Returns false, and loses nothing that it held before, when the budget has no room
   // for them.
   [[nodiscard]] bool add(const ValueMap& values, KeptBytesBudget& budget);
 
@@ -44,7 +44,7 @@ class PreviousValues {
   // Null for a shape of which no message is kept.
   Latest* latestOf(const Shape& shape);
   [[nodiscard]] bool replace(Latest& latest, const ValueMap& values, KeptBytesBudget& budget);
-  // Merges the messages that are kept, in order. Returns false, and keeps the rest, when the budget has no room
+  // Merges the messages that are kept, in order. Returns false, and keeps the rest, if the budget has no room
   // for what they become.
   [[nodiscard]] bool mergeAll(KeptBytesBudget& budget);
   // The messages that are not merged, in order of arrival.

@@ -229,7 +229,7 @@ void TWReportingSession::startWorker(TWReportingSessionWorkerProtocol& worker) {
            yesOrNo(worker.started), reporterID_);
 }
 
-// Returns each worker once. Workers that are both come with the role that `order` puts first. Their order within
+// Returns each worker once. Workers that are both come with the role that `order` has first. The order within
 // a role is the one in which they were made.
 std::vector<TWReportingSessionWorkerProtocol*> TWReportingSession::workersInOrder(Order order) const {
   using Class = TWReportingSessionWorkerClass;

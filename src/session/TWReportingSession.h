@@ -104,7 +104,7 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   // The latest value of every key received.
   ValueMap previousValues() const;
   void addPreviousValues(const ValueMap& values);
-  // Takes over the previous values of `other`, a session of the same client that has left the budget, in place
+  // Takes over the previous values of `other`, a session of this client that has left the budget, in place
   // of its own. They fit, because `other` took them from the same budget.
   void takePreviousValuesOf(const TWReportingSession& other);
   // Moves the bytes that the session keeps out of the client's budget. For a session that the client has
@@ -152,7 +152,7 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
     TWReportingSessionWorkerClass::Worker worker;
   };
 
-  // Does what addMissingDates(), addAudioMessageTag() and addAppName() do, without making a tree. Returns false
+  // Does what addMissingDates(), addAudioMessageTag() and addAppName() do, but makes no tree. Returns false
   // when the message is a tree, or must become one; the message may then be complete in part.
   [[nodiscard]] bool completePacked(TWReportingSessionMessage& message) const;
   std::shared_ptr<TWReportingSessionMessage> lifecycleMessage(AudioEventType type,

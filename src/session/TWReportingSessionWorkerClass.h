@@ -15,7 +15,7 @@
 
 namespace tonewerk {
 
-// A set of message types. The numbers from 63 on, which are not types, or mean an unknown one, are in it together
+// A set of message types. The numbers from 63 on, which mean no type or an unknown one, are in it together
 // or not at all.
 class MessageTypes {
  public:

@@ -11,7 +11,7 @@ class TWReportingSessionMessage;
 //
 // A class may have two static functions that return true: startOnInit(), to be made and started with the
 // session, and handleSingleMessageSession(), to run in single-message sessions, too. One that does nothing
-// with messages of other types may say so in a static constant `kHandledTypes`; it is then not called for them.
+// with messages of other types may say so in a static constant `kHandledTypes`; it then does not get them.
 class TWReportingSessionWorkerConsumerProtocol : public virtual TWReportingSessionWorkerProtocol {
  public:
   // `message` is the session's own record: take a copy to keep or change it. The result is ignored.

@@ -78,8 +78,8 @@ class ValueMap {
   void reserve(std::size_t count);
 
   // Returns about how many bytes the map holds on the heap: entries, keys and values, nested ones included.
-  // Of a packed map, how long its block is; a tree that find() made beside it does not count. So a merge of a packed map
-  // may add more than its bytes(). O(1).
+  // Of a packed map, how long its block is, without a tree that find() made beside it. So a merge of a packed
+  // map may add more than its bytes(). O(1).
   std::size_t bytes() const;
   // True when both share their storage; they are then equal. When it is false, they may still be equal.
   bool sharesStorageWith(const ValueMap& other) const { return tagged_ == other.tagged_; }

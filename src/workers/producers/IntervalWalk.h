@@ -23,7 +23,7 @@ namespace tonewerk {
 //   intervals    |----- A -----||----- B ------|
 //
 // The walk finds where intervals begin and end, leaves out those that are too short, numbers and counts the
-// summaries, and logs what it does. A producer derives from it and says which changes end an interval and what
+// summaries, and logs what it does. A producer derives from it and says what ends an interval and what
 // a summary holds. An object walks once, on the work queue.
 //
 // Sessions store many messages, and few of them end an interval. So the walk does not collect what every

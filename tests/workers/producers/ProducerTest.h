@@ -159,8 +159,8 @@ class ProducerTest : public ReportingTest {
     }
   }
 
-  // A property: with any stream and any previous values, the producer's summaries are those of `plain`, to the
-  // order of their keys and the kinds of their values. The stream's rapid spatial messages are merged first if
+  // A property: with any stream and previous values, the producer's summaries are those of `plain`, to the
+  // order of their keys and the kinds of their values. Rapid spatial messages are merged first if
   // they are at most `maxPauseSeconds` apart; 0 for not at all.
   void checkAgainst(PlainWalk plain, std::vector<std::string> keys, double maxPauseSeconds) {
     const auto messages = anyStream(keys);

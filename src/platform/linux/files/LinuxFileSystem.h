@@ -12,7 +12,7 @@ namespace tonewerk {
 // Reads and writes the kernel's files. Errors are those of the system calls. A name that is not a plain file
 // name fails with std::errc::invalid_argument.
 //
-// Text is written in blocks of 256 KiB. A write() may therefore fail for the text of earlier calls, all further
+// Text is written in blocks of 256 KiB. A write() may therefore fail for text of earlier calls, all further
 // ones then fail like it, and place() may be the first to notice.
 //
 // A new file is first written in its directory under a hidden name: ".new-" and a number. It is locked, and

@@ -15,8 +15,8 @@ struct JsonNumber {
   friend bool operator==(const JsonNumber&, const JsonNumber&) = default;
 };
 
-// Returns the positions of all numbers, in order. The JSON library's parser, which does not tell positions, must
-// have accepted `text`. That parser ends at a zero byte, and so does this function. `text` must be smaller than
+// Returns the positions of all numbers, in order. The JSON library's parser, which tells no positions, must
+// have accepted `text`. That parser ends at a zero byte, and so does this function. `text` is smaller than
 // 4 GiB.
 [[nodiscard]] std::vector<JsonNumber> numbersInJson(std::string_view text);
 

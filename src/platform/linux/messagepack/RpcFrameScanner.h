@@ -17,7 +17,7 @@ namespace tonewerk {
 //
 //   scan() -> kFrame      frame() describes a request or a notification at the front of the bytes
 //          -> kNeedsMore  the frame's end has not arrived; scan again with the same bytes and more
-//          -> kBroken     not this protocol, or a response; problem() says why. Nothing can be scanned after it
+//          -> kBroken     not this protocol, or a response; problem() says why. Nothing is scanned after it
 //
 // It looks at each byte once, however small the pieces are in which a frame arrives. One thread.
 class RpcFrameScanner {

@@ -66,7 +66,7 @@ class StoreQueue {
   void stop();
 
   // The functions from here to pause() are for the writer's thread. take() replaces `batch`, whose rows are
-  // committed, by the next batch. Without `wait` it returns at once, perhaps with none. False when stopped and
+  // committed, by the next batch. Without `wait` it returns at once, maybe with none. False when stopped and
   // empty.
   [[nodiscard]] bool take(StoreBatch& batch, bool wait);
   // A try to write the batch begins.
