@@ -88,7 +88,9 @@ TEST_F(PreviousValuesTest, AgreesWithMergingEachMessage) {
       plain.merge(map);
     }
     ASSERT_EQ(budget.used(), values.bytes());
-    if (step % 50 == 0) ASSERT_EQ(values.merged().text(), plain.text()) << step;
+    if (step % 50 == 0) {
+      ASSERT_EQ(values.merged().text(), plain.text()) << step;
+    }
   }
 }
 

@@ -36,6 +36,9 @@ bool isPowerOfTwo(int number) { return (number & (number - 1)) == 0; }
 }  // namespace
 
 Allocator Allocator::ofTheProcess() {
+  // Either call also keeps the C library from changing the limits.
+  ::mallopt(M_TRIM_THRESHOLD, kMaxFreeEndBytes);
+  ::mallopt(M_MMAP_THRESHOLD, kMaxSharedBlockBytes);
   return {idleBytesOfTheProcess, [] { ::malloc_trim(0); }};
 }
 

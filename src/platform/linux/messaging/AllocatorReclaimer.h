@@ -20,6 +20,13 @@ struct Allocator {
   // Returns free memory to the system. Threads that allocate meanwhile may wait until it has finished.
   std::function<void()> giveBack;
 
+  // Free bytes that each thread's part of the memory may keep at its end, where giveBack() cannot reach them.
+  // Left alone, the C library raises this to twice the largest block that was ever freed, up to 64 MiB.
+  static constexpr int kMaxFreeEndBytes = 4 << 20;
+  // Larger blocks are memory of their own, which returns to the system when they are freed.
+  static constexpr int kMaxSharedBlockBytes = 1 << 20;
+
+  // Sets both limits above for the whole process.
   static Allocator ofTheProcess();
 };
 
