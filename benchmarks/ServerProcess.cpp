@@ -65,6 +65,7 @@ ServerProcess::~ServerProcess() {
   stop();
   std::error_code error;
   std::filesystem::remove_all(directory_, error);
+  std::filesystem::remove(outputPath(), error);
 }
 
 void ServerProcess::start(const std::string& program, const std::vector<std::string>& arguments,
@@ -73,7 +74,7 @@ void ServerProcess::start(const std::string& program, const std::vector<std::str
   std::vector<char*> command{const_cast<char*>(program.c_str())};
   for (const std::string& argument : arguments) command.push_back(const_cast<char*>(argument.c_str()));
   command.push_back(nullptr);
-  const int output = ::open((directory_ + "/output").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
+  const int output = ::open(outputPath().c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
   process_ = ::fork();
   if (process_ == 0) execute(command, output);
   ::close(output);
@@ -124,7 +125,7 @@ std::map<std::string, std::uint64_t> ServerProcess::waitsByThread() const {
   return waits;
 }
 
-std::string ServerProcess::output() const { return textOfFile(directory_ + "/output"); }
+std::string ServerProcess::output() const { return textOfFile(outputPath()); }
 
 void ServerProcess::waitUntilIdle() const {
   const auto deadline = std::chrono::steady_clock::now() + kTimeout;

@@ -57,6 +57,8 @@ class ServerProcess {
   [[noreturn]] void failWithOutput(const std::string& what) const;
   bool hasEnded();
   void stop();
+  // Outside of the directory, in which the server may watch every change.
+  std::string outputPath() const { return directory_ + ".output"; }
 
   std::string directory_;
   pid_t process_ = -1;

@@ -1,7 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/Log.h"
 
+#include <algorithm>
+#include <array>
 #include <cassert>
+#include <charconv>
 #include <cstdio>
 
 namespace tonewerk {
@@ -40,9 +43,19 @@ void appendLogNumber(std::string& out, double number, char conversion) {
 }
 
 std::string logPrefix(std::string_view file, int line) {
-  const std::string name(baseName(file));
-  char text[128];
-  std::snprintf(text, sizeof(text), "%25s:%-5d ", name.c_str(), line);
+  constexpr std::size_t kNameWidth = 25;
+  constexpr std::size_t kLineWidth = 5;
+  const std::string_view name = baseName(file);
+  std::array<char, 16> digits{};
+  const char* const end = std::to_chars(digits.data(), digits.data() + digits.size(), line).ptr;
+  const auto size = static_cast<std::size_t>(end - digits.data());
+  std::string text;
+  text.reserve(160);  // a usual message, too
+  text.append(kNameWidth - std::min(kNameWidth, name.size()), ' ');
+  text += name;
+  text += ':';
+  text.append(digits.data(), size);
+  text.append(kLineWidth - std::min(kLineWidth, size) + 1, ' ');
   return text;
 }
 

@@ -16,6 +16,7 @@
 #include "platform/linux/files/LinuxFileSystem.h"
 #include "platform/linux/json/JsonBenchfile.h"
 #include "platform/linux/json/NlohmannJsonService.h"
+#include "platform/linux/log/CondensingLog.h"
 #include "platform/linux/log/RecentLines.h"
 #include "platform/linux/log/RememberingLog.h"
 #include "platform/linux/log/StandardLog.h"
@@ -65,7 +66,8 @@ struct LinuxPlatform::Adapters {
   const std::string logsDirectory;
   SystemClock clock;
   const std::shared_ptr<RecentLines> logLines = std::make_shared<RecentLines>();
-  std::unique_ptr<Log> log = std::make_unique<RememberingLog>(makeStandardLog(clock), logLines, clock);
+  std::unique_ptr<Log> log = std::make_unique<CondensingLog>(
+      std::make_unique<RememberingLog>(makeStandardLog(clock), logLines, clock), clock);
   LogCategory category{*log, "com.orvane.tonewerk", "twrs"};  // the adapters' own lines
   UsdtTracePoints tracePoints;
   ThreadQueueFactory queues;
