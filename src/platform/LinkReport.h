@@ -6,6 +6,7 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "values/Value.h"
@@ -28,7 +29,8 @@ inline const SharedString kLinkReportUserInfoServiceName("kLinkReportUserInfoSer
 //
 //   initWithSessionInfo() -> startConfiguration...() -> [backends] -> sendMessage...()... -> flushMessages()
 //
-// Use it on one thread at a time. No call waits for a network. Destroying it ends the session; its handler
+// Use it on one thread at a time; different sessions may be on different threads. No call waits for a
+// network. Destroying it ends the session; its handler
 // may still be called after that.
 class LinkReportSession {
  public:
@@ -41,10 +43,16 @@ class LinkReportSession {
   // Asks for the backends. `handler` is called at most once, before or after this returns, on any thread.
   virtual void startConfigurationWithCompletionHandler(CompletionHandler handler) = 0;
 
+  // The entries of a message, without one of them.
+  struct Payload {
+    const ValueMap& entries;
+    std::string_view hidden = {};  // this key is not sent; empty for none
+  };
+
   // Passes the message to every backend; each delivers it later. Returns false when a backend could not take
   // it; `problem` then says why, or is empty. May wait while the report store's queue is full.
   [[nodiscard]] virtual bool sendMessageWithCategory(std::uint16_t category, std::uint16_t type,
-                                                     const ValueMap& payload, std::string& problem) = 0;
+                                                     const Payload& payload, std::string& problem) = 0;
 
   // Sends the messages now instead of in a batch. Does not wait for it.
   virtual void flushMessages() = 0;
@@ -53,7 +61,7 @@ class LinkReportSession {
   virtual std::string description() const = 0;
 };
 
-// The real-time-communication reporting service. Use it on one thread at a time. It outlives its sessions.
+// The real-time-communication reporting service. Any thread. It outlives its sessions.
 class LinkReport {
  public:
   virtual ~LinkReport() = default;

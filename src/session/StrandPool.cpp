@@ -90,6 +90,7 @@ Strand::Strand(std::shared_ptr<StrandPool::Shared> shared) : shared_(std::move(s
 Strand::~Strand() { takeHeld(); }
 
 void Strand::submit(std::size_t bytes, Task work) {
+  waitingCount_.fetch_add(1, std::memory_order_relaxed);
   SinkQueue* thread = nullptr;
   {
     const MutexLock lock(shared_->mutex);
@@ -105,11 +106,18 @@ void Strand::interrupt(Task work) {
   {
     const MutexLock lock(shared_->mutex);
     if (shared_->thread == nullptr) return;
-    if (!shared_->thread->isCurrent()) {
-      shared_->thread->post(std::move(work));
+    if (!isRunningHere() && !shared_->thread->isCurrent()) {
+      shared_->thread->post([self = shared_from_this(), held = std::move(work)] { self->run(held); });
       return;
     }
   }
+  if (isRunningHere()) return work();
+  run(work);
+}
+
+void Strand::run(const Task& work) {
+  running_.lock();
+  const Turn turn(*this);
   work();
 }
 
@@ -131,6 +139,7 @@ void Strand::release() {
     held_.pop_front();
     shared_->giveBack(*this, piece.bytes, 1, held_.empty());
     piece.work();
+    waitingCount_.fetch_sub(1, std::memory_order_release);
   }
 }
 
@@ -140,18 +149,23 @@ std::uint64_t Strand::takeDroppedCount() {
 }
 
 bool Strand::ownsThisThread() const {
+  if (isRunningHere()) return true;
   const MutexLock lock(shared_->mutex);
-  return shared_->thread == nullptr || shared_->thread->ownsThisThread();
+  return shared_->thread == nullptr;
 }
 
 void Strand::runOrHold(std::size_t bytes, Task work) {
-  if (!isHeld_) {
-    work();
-  } else if (shared_->reserve(*this, bytes + kPieceBytes)) {
-    held_.push_back({bytes + kPieceBytes, std::move(work)});
-  } else {
-    ++droppedCount_;
-  }
+  run([&] {
+    if (!isHeld_) {
+      work();
+    } else if (shared_->reserve(*this, bytes + kPieceBytes)) {
+      held_.push_back({bytes + kPieceBytes, std::move(work)});
+      return;
+    } else {
+      ++droppedCount_;
+    }
+    waitingCount_.fetch_sub(1, std::memory_order_release);
+  });
 }
 
 std::deque<Strand::Piece> Strand::takeHeld() {

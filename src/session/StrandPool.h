@@ -1,12 +1,15 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <atomic>
 #include <cstddef>
 #include <cstdint>
 #include <deque>
 #include <memory>
+#include <thread>
 
 #include "platform/SerialQueue.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -53,6 +56,7 @@ class StrandPool {
 };
 
 // One serial queue of a StrandPool. Lives while there is a reference to it; its pieces of work may have one.
+// No two of its pieces run at the same time.
 class Strand : public std::enable_shared_from_this<Strand> {
  public:
   explicit Strand(std::shared_ptr<StrandPool::Shared> shared);
@@ -64,21 +68,35 @@ class Strand : public std::enable_shared_from_this<Strand> {
   // the order of their submission.
   void submit(std::size_t bytes, Task work);
 
+  // Runs `work` on the calling thread when no piece waits before it. Returns false, without running it, when
+  // one does, or when a piece is running: submit() then keeps the order. `work` must not hold(). One thread
+  // alone calls it and submit(), while the pool lives.
+  template <typename Work>
+  [[nodiscard]] bool runAtOnce(Work&& work) {
+    if (waitingCount_.load(std::memory_order_acquire) != 0 || isRunningHere() || !running_.try_lock()) {
+      return false;
+    }
+    const Turn turn(*this);
+    if (isHeld_) return false;
+    work();
+    return true;
+  }
+
   // Runs `work` on the pool's thread between two pieces, even while the strand holds pieces back. From
   // inside a piece it runs `work` before it returns. Any thread; never waits; does nothing once the pool is
   // gone.
   void interrupt(Task work);
 
-  // On the pool's thread. After hold() the pieces behind the running one wait for release(), which runs them
-  // before it returns. One of them may call hold() again.
+  // In a piece on the pool's thread. After hold() the pieces behind the running one wait for release(), which
+  // runs them before it returns. One of them may call hold() again.
   void hold();
   void release();
   bool isHeld() const;
 
-  // On the pool's thread. Returns how many pieces were dropped since the last call because they did not fit.
+  // In a piece. Returns how many pieces were dropped since the last call because they did not fit.
   std::uint64_t takeDroppedCount();
 
-  // True on the pool's thread, and on any thread once the pool is gone. For assertions.
+  // True in a piece, and on any thread once the pool is gone. For assertions.
   bool ownsThisThread() const;
 
  private:
@@ -88,11 +106,33 @@ class Strand : public std::enable_shared_from_this<Strand> {
     Task work;
   };
 
+  // The calling thread's turn to run pieces: takes over the locked running_, and unlocks it in the end.
+  class SCOPED_CAPABILITY Turn {
+   public:
+    explicit Turn(Strand& strand) REQUIRES(strand.running_) : strand_(strand) {
+      strand_.runner_.store(std::this_thread::get_id(), std::memory_order_relaxed);
+    }
+    Turn(const Turn&) = delete;
+    Turn& operator=(const Turn&) = delete;
+    ~Turn() RELEASE() {
+      strand_.runner_.store(std::thread::id(), std::memory_order_relaxed);
+      strand_.running_.unlock();
+    }
+
+   private:
+    Strand& strand_;
+  };
+
+  bool isRunningHere() const { return runner_.load(std::memory_order_relaxed) == std::this_thread::get_id(); }
+  // Runs `work` when no other piece runs. On the pool's thread.
+  void run(const Task& work);
   void runOrHold(std::size_t bytes, Task work);
   std::deque<Piece> takeHeld();
 
   const std::shared_ptr<StrandPool::Shared> shared_;
-  // Used on the pool's thread alone.
+  std::atomic<std::size_t> waitingCount_ = 0;  // submitted, and neither finished nor dropped
+  Mutex running_;                              // held while a piece runs; guards what is below
+  std::atomic<std::thread::id> runner_;        // who holds it, if anybody
   bool isHeld_ = false;
   std::deque<Piece> held_;
   std::uint64_t droppedCount_ = 0;

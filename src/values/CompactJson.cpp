@@ -115,6 +115,7 @@ class JsonWriter {
   void value(const Value& value);
   void value(EncodedValue value);
   void map(const ValueMap& map);
+  void mapWithout(const ValueMap& map, std::string_view hidden);
   void text(std::string_view text);
 
  private:
@@ -262,6 +263,32 @@ void JsonWriter::map(const ValueMap& map) {
   out_.add('}');
 }
 
+void JsonWriter::mapWithout(const ValueMap& map, std::string_view hidden) {
+  out_.add('{');
+  bool isFirst = true;
+  const auto separate = [&] {
+    if (!std::exchange(isFirst, false)) out_.add(',');
+  };
+  if (const PackedMap* held = map.packed()) {
+    const Shape& shape = held->shape();
+    held->forEach([&, hiddenSlot = shape.find(hidden)](std::size_t slot, EncodedValue entry) {
+      if (slot == hiddenSlot) return;
+      separate();
+      out_.add(shape.json(slot).substr(1));  // without the comma
+      value(entry);
+    });
+  } else {
+    for (const ValueMap::Entry& entry : map) {
+      if (entry.key.view() == hidden) continue;
+      separate();
+      text(entry.key);
+      out_.add(':');
+      value(entry.value);
+    }
+  }
+  out_.add('}');
+}
+
 }  // namespace
 
 void appendCompactJson(std::string& out, ValueView value) {
@@ -274,6 +301,11 @@ void appendCompactJson(std::string& out, ValueView value) {
 }
 
 void appendCompactJson(std::string& out, const ValueMap& map) { JsonWriter(out).map(map); }
+
+void appendCompactJson(std::string& out, const ValueMap& map, std::string_view hidden) {
+  if (hidden.empty() || !map.contains(hidden)) return appendCompactJson(out, map);
+  JsonWriter(out).mapWithout(map, hidden);
+}
 
 void appendJsonText(std::string& out, std::string_view text) { JsonWriter(out).text(text); }
 

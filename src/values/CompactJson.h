@@ -16,6 +16,8 @@ namespace tonewerk {
 // The text of a packed map is that of its tree, and is made without one.
 void appendCompactJson(std::string& out, ValueView value);
 void appendCompactJson(std::string& out, const ValueMap& map);
+// Without the entry `hidden`; an empty key hides nothing.
+void appendCompactJson(std::string& out, const ValueMap& map, std::string_view hidden);
 void appendJsonText(std::string& out, std::string_view text);
 
 }  // namespace tonewerk

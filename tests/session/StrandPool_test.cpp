@@ -4,6 +4,7 @@
 #include <gmock/gmock.h>
 #include <optional>
 #include <string>
+#include <thread>
 
 #include "support/manual/ManualSerialQueue.h"
 
@@ -88,6 +89,70 @@ TEST_F(StrandPoolTest, AnInterruptFromInsideAPieceRunsAtOnce) {
     ran += "outer";
   });
   thread->runAll();
+  EXPECT_EQ(ran, "innerouter");
+}
+
+TEST_F(StrandPoolTest, RunsAtOnceWhenNoPieceWaits) {
+  std::thread::id runner;
+  EXPECT_TRUE(strand->runAtOnce([&] {
+    runner = std::this_thread::get_id();
+    EXPECT_TRUE(strand->ownsThisThread());
+  }));
+  EXPECT_EQ(runner, std::this_thread::get_id());
+  EXPECT_FALSE(strand->ownsThisThread());
+  submit(*strand, "a");
+  thread->runAll();
+  EXPECT_TRUE(strand->runAtOnce([&] { ran += "b"; }));
+  EXPECT_EQ(ran, "ab");
+}
+
+TEST_F(StrandPoolTest, DoesNotRunAtOnceBeforePiecesThatWait) {
+  submit(*strand, "a");
+  EXPECT_FALSE(strand->runAtOnce([&] { ran += "b"; }));
+  EXPECT_EQ(ran, "");
+}
+
+TEST_F(StrandPoolTest, DoesNotRunAtOnceBeforePiecesThatAreHeld) {
+  submitHolding(*strand);
+  submit(*strand, "a");
+  thread->runAll();
+  EXPECT_FALSE(strand->runAtOnce([&] { ran += "b"; }));
+  strand->interrupt([&] { strand->release(); });
+  thread->runAll();
+  EXPECT_TRUE(strand->runAtOnce([&] { ran += "c"; }));
+  EXPECT_EQ(ran, "ac");
+}
+
+TEST_F(StrandPoolTest, DoesNotRunAtOnceWhileHeldWithoutAnyPiece) {
+  submitHolding(*strand);
+  thread->runAll();
+  EXPECT_FALSE(strand->runAtOnce([&] { ran += "a"; }));
+  strand->interrupt([&] { strand->release(); });
+  thread->runAll();
+  EXPECT_TRUE(strand->runAtOnce([&] { ran += "b"; }));
+  EXPECT_EQ(ran, "b");
+}
+
+TEST_F(StrandPoolTest, DoesNotRunAtOnceWhileAPieceRuns) {
+  EXPECT_TRUE(strand->runAtOnce([&] { EXPECT_FALSE(strand->runAtOnce([&] { ran += "inner"; })); }));
+  EXPECT_EQ(ran, "");
+}
+
+TEST_F(StrandPoolTest, RunsAtOnceAgainAfterADroppedPiece) {
+  submitHolding(*strand);
+  submit(*strand, "a", kMax + 1);
+  thread->runAll();
+  strand->interrupt([&] { strand->release(); });
+  thread->runAll();
+  EXPECT_TRUE(strand->runAtOnce([&] { ran += "b"; }));
+  EXPECT_EQ(ran, "b");
+}
+
+TEST_F(StrandPoolTest, AnInterruptFromWorkThatRunsAtOnceRunsBeforeItReturns) {
+  EXPECT_TRUE(strand->runAtOnce([&] {
+    strand->interrupt([&] { ran += "inner"; });
+    ran += "outer";
+  }));
   EXPECT_EQ(ran, "innerouter");
 }
 

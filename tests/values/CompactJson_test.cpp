@@ -6,7 +6,11 @@
 #include <limits>
 #include <nlohmann/json.hpp>
 #include <rapidcheck/gtest.h>
+#include <string>
+#include <string_view>
+#include <vector>
 
+#include "support/PackedMaps.h"
 #include "support/ValueGenerators.h"
 
 namespace tonewerk {
@@ -54,6 +58,31 @@ bool says(const Json& json, const Value& value) {
     ++entry;
   }
   return true;
+}
+
+std::string withoutKey(const ValueMap& map, std::string_view hidden) {
+  std::string out;
+  appendCompactJson(out, map, hidden);
+  return out;
+}
+
+TEST(CompactJsonTest, LeavesAnEntryOut) {
+  const std::vector<ValueMapEntry> entries{{"a", 1}, {"b \"", "two"}, {"c", 3.0}};
+  ShapeTable shapes;
+  const ValueMap packed = packedMapOf(entries, shapes);
+  const ValueMap tree{entries[0], entries[1], entries[2]};
+  for (const std::string_view hidden : {"a", "b \"", "c", "d", ""}) {
+    ValueMap rest = tree;
+    rest.erase(hidden);
+    EXPECT_EQ(withoutKey(tree, hidden), rest.text()) << hidden;
+    EXPECT_EQ(withoutKey(packed, hidden), rest.text()) << hidden;
+  }
+}
+
+TEST(CompactJsonTest, LeavesTheOnlyEntryOut) {
+  ShapeTable shapes;
+  EXPECT_EQ(withoutKey({{"a", 1}}, "a"), "{}");
+  EXPECT_EQ(withoutKey(packedMapOf({{"a", 1}}, shapes), "a"), "{}");
 }
 
 RC_GTEST_PROP(CompactJsonTest, SaysTheSameToAnyParserInTheSameOrder, ()) {

@@ -11,6 +11,7 @@
 #include "session/TWReportingContext.h"
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingUtility.h"
+#include "values/CompactJson.h"
 #include "workers/sinks/RtcSummary.h"
 #include "workers/sinks/TWReportingSessionRtcWorker.h"
 
@@ -21,6 +22,12 @@ const Value TWReportingClientNameTonewerk("com.orvane.tonewerk");
 constexpr double TWReportingVersionNumber = 2.1;
 constexpr std::int64_t kClientType = 19;
 const SharedString kSessionIdentifierKey("TWReportingSessionID");
+
+std::string textOf(const LinkReportSession::Payload& payload) {
+  std::string text;
+  appendCompactJson(text, payload.entries, payload.hidden);
+  return text;
+}
 
 }  // namespace
 
@@ -137,7 +144,7 @@ void RtcReporter::resume() {
   queue_->release();
 }
 
-void RtcReporter::handleMessage(TWReportingSessionMessage& message) {
+void RtcReporter::handleMessage(const TWReportingSessionMessage& message) {
   assert(queue_->ownsThisThread());
   if (!linkReportSessionStarted_) {
     defaultLog(TWReportingSessionLinkReportCategory(), "Session never started. %s", "handleMessage");
@@ -146,16 +153,17 @@ void RtcReporter::handleMessage(TWReportingSessionMessage& message) {
   sendMessage(message);
 }
 
-void RtcReporter::sendMessage(TWReportingSessionMessage& message) {
+void RtcReporter::sendMessage(const TWReportingSessionMessage& message) {
   debugLog(TWReportingSessionLinkReportCategory(), "entering linkreport %s", "_sendMessage");
   const std::uint16_t category =
       TWReportingSessionRtcWorker::retrieveLinkReportCategoryFromCategory(message.category);
-  if (!TWReportingUtilityIsInternalBuild()) message.message.erase(TWReportingInternalEventEpochTime);
+  LinkReportSession::Payload payload{message.message};
+  if (!TWReportingUtilityIsInternalBuild()) payload.hidden = TWReportingInternalEventEpochTime;
   std::string problem;
-  if (linkReportSession_->sendMessageWithCategory(category, message.type, message.message, problem)) {
-    debugLog(TWReportingSessionLinkReportCategory(),
-             "LinkReportAgent %@ : message %@ : category %i : type %i", *linkReportSession_, message.message,
-             category, message.type);
+  if (linkReportSession_->sendMessageWithCategory(category, message.type, payload, problem)) {
+    debugLog(
+        TWReportingSessionLinkReportCategory(), "LinkReportAgent %@ : message %@ : category %i : type %i",
+        *linkReportSession_, [&payload] { return textOf(payload); }, category, message.type);
   } else if (!problem.empty()) {
     errorLog(TWReportingSessionLinkReportCategory(), "error sending message %@", problem);
   }
@@ -165,7 +173,7 @@ void RtcReporter::sendSummary(const TWReportingSessionMessages& messages, AudioS
                               ReporterID reporterID) {
   assert(queue_->ownsThisThread());
   if (!linkReportSessionStarted_ || messages.empty()) return;
-  TWReportingSessionMessage summary(
+  const TWReportingSessionMessage summary(
       rtcSummaryOf(messages, serviceType, TWReportingSessionRtcWorker::kWorkerClass), kCategoryUnknown,
       kTypeUnknown);
   defaultLog(TWReportingSessionLinkReportCategory(), "sending rtc summary event. reporterID=%lli",

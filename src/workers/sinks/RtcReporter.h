@@ -42,7 +42,7 @@ class RtcReporter : public std::enable_shared_from_this<RtcReporter> {
 
   // All of these are called on the queue.
   void start(const Start& start);
-  void handleMessage(TWReportingSessionMessage& message);
+  void handleMessage(const TWReportingSessionMessage& message);
   // `messages` are copies of the session's messages, made for this call.
   void sendSummary(const TWReportingSessionMessages& messages, AudioServiceType serviceType,
                    ReporterID reporterID);
@@ -56,7 +56,7 @@ class RtcReporter : public std::enable_shared_from_this<RtcReporter> {
   void takeTimeout(std::uint64_t run);
   void endWait();
   void resume();
-  void sendMessage(TWReportingSessionMessage& message);
+  void sendMessage(const TWReportingSessionMessage& message);
 
   const std::shared_ptr<Strand> queue_;
   bool linkReportSessionStarted_ = false;

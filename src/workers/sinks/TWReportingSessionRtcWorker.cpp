@@ -57,8 +57,9 @@ std::optional<bool> TWReportingSessionRtcWorker::start() {
 
 bool TWReportingSessionRtcWorker::handleMessage(const TWReportingSessionMessage& message) {
   assert(TWReportingUtilityIsOnReportingServerQueue());
-  auto record = std::make_unique<TWReportingSessionMessage>(message.message, message.category, message.type);
   makeQueueOnFirstUse();
+  if (linkReportQueue_->runAtOnce([&] { reporter_->handleMessage(message); })) return false;
+  auto record = std::make_unique<TWReportingSessionMessage>(message.message, message.category, message.type);
   const std::size_t bytes = sizeof(TWReportingSessionMessage) + record->message.bytes();
   linkReportQueue_->submit(
       bytes, [reporter = reporter_, held = std::move(record)] { reporter->handleMessage(*held); });

@@ -15,8 +15,10 @@ class RtcReporter;
 // Forwards a session's messages to the real-time-communication reporting service when they arrive, and when
 // the session stops one summary of all their keys. Sessions of the "test" service have no such worker.
 //
-// The work queue only queues the work. The service is used on a strand of the shared StrandPool. Its first
-// piece waits up to nine seconds for the service's backends, and messages and the stop wait behind it.
+// The service is used on a strand of the shared StrandPool. Its first piece waits up to nine seconds for the
+// service's backends, and messages and the stop wait behind it. A message that nothing is ahead of has its
+// turn on the strand at once, on the work queue's thread: handing it to the other thread would cost several
+// times more than the service does, which only queues it.
 // `started` belongs to the session; the backends' answer does not change it.
 class TWReportingSessionRtcWorker final : public TWReportingSessionWorkerConsumerProtocol {
  public:

@@ -94,6 +94,26 @@ TEST_F(TWReportingSessionRtcWorkerTest, TheWorkQueueOnlyQueues) {
   EXPECT_THAT(service(0).messages, SizeIs(2));
 }
 
+TEST_F(TWReportingSessionRtcWorkerTest, AMessageThatNothingIsAheadOfIsSentAtOnce) {
+  startAndRun();
+  send({{"a", 1}});
+  ASSERT_THAT(service(0).messages, SizeIs(1));
+  EXPECT_EQ(service(0).messages[0].payload.integer("a"), 1);
+}
+
+TEST_F(TWReportingSessionRtcWorkerTest, MessagesStayInOrderBehindTheStart) {
+  startAndRun();
+  send({{"a", 1}});
+  session->stop();
+  session->start();
+  send({{"a", 2}});
+  EXPECT_THAT(service(0).messages, SizeIs(1));
+  run();
+  ASSERT_THAT(service(0).messages, SizeIs(2));  // the other one is the summary
+  ASSERT_THAT(service(1).messages, SizeIs(1));
+  EXPECT_EQ(service(1).messages[0].payload.integer("a"), 2);
+}
+
 TEST_F(TWReportingSessionRtcWorkerTest, ThousandsOfSessionsShareOneQueuesThread) {
   std::vector<std::shared_ptr<TWReportingSession>> sessions;
   for (ReporterID id = 100; id < 200; ++id) {

@@ -60,14 +60,15 @@ class LinuxLinkReport::Session final : public LinkReportSession {
   }
 
   [[nodiscard]] bool sendMessageWithCategory(std::uint16_t category, std::uint16_t type,
-                                             const ValueMap& payload, std::string& problem) override {
-    const std::size_t bytes = payload.bytes();
+                                             const Payload& payload, std::string& problem) override {
+    const std::size_t bytes = payload.entries.bytes();
     if (bytes > kMaxPayloadBytes) {
       problem = "a payload of " + std::to_string(bytes) + " bytes is too large";
       return false;
     }
     const double now = service_.clock_.now();
-    if (isLocal_) service_.store_.record(RtcMessageRow{now, stored_, category, type, payload});
+    if (isLocal_)
+      service_.store_.record(RtcMessageRow{now, stored_, category, type, payload.entries, payload.hidden});
     if (!exporters_.empty()) exportMessage(now, category, type, payload);
     return true;
   }
@@ -79,15 +80,16 @@ class LinuxLinkReport::Session final : public LinkReportSession {
   std::string description() const override { return eventName_ + " " + std::to_string(sessionIdentifier_); }
 
  private:
-  void exportMessage(double now, std::uint16_t category, std::uint16_t type, const ValueMap& payload) {
+  void exportMessage(double now, std::uint16_t category, std::uint16_t type, const Payload& payload) {
     OtlpLogRecord record;
     record.time = now;
-    record.identifier = service_.identifiers_.next(now);
+    record.identifier = service_.nextIdentifier(now);
     record.eventName = eventName_;
     record.sessionIdentifier = sessionIdentifier_;
     record.category = category;
     record.type = type;
-    record.payload = payload;
+    record.payload = payload.entries;
+    if (!payload.hidden.empty()) record.payload.erase(payload.hidden);
     record.repeatsEventName = repeatsEventName_;
     // An exporter counts what it drops and logs the sum: a line for each message would be too many.
     for (OtlpExporter* exporter : exporters_) (void)exporter->add(record, urgency_);
@@ -119,7 +121,7 @@ LinuxLinkReport::~LinuxLinkReport() = default;
 // A token begins with its parent's token. So it is the path from the root.
 std::optional<std::string> LinuxLinkReport::newHierarchyTokenFromParentToken(
     const std::optional<std::string>& parentToken) {
-  const std::string token = identifiers_.next(clock_.now());
+  const std::string token = nextIdentifier(clock_.now());
   return parentToken ? *parentToken + "/" + token : token;
 }
 
@@ -128,12 +130,18 @@ std::unique_ptr<LinkReportSession> LinuxLinkReport::initWithSessionInfo(
   return std::make_unique<Session>(*this, sessionInfo, userInfo);
 }
 
+std::string LinuxLinkReport::nextIdentifier(double now) {
+  const MutexLock lock(identifiersMutex_);
+  return identifiers_.next(now);
+}
+
 LinkReportBackends LinuxLinkReport::backendsOf(const ValueMap& preferences) {
   const Value* configured = preferences.find(kBackendsKey);
   LinkReportBackends backends =
       LinkReportBackends::from(configured == nullptr ? std::nullopt : std::optional(*configured));
   std::string problems;
   for (const std::string& problem : backends.problems) problems += problem + "; ";
+  const MutexLock lock(mutex_);
   if (!problems.empty() && problems != loggedProblems_) {
     errorLog(log_, "%@ of %@: %@left out", kBackendsKey, kPreferenceDomain, problems);
   }
@@ -142,6 +150,7 @@ LinkReportBackends LinuxLinkReport::backendsOf(const ValueMap& preferences) {
 }
 
 OtlpExporter* LinuxLinkReport::exporterFor(const std::string& url) {
+  const MutexLock lock(mutex_);
   const auto known = exporters_.find(url);
   if (known != exporters_.end()) return known->second.get();
   if (exporters_.size() >= kMaxExporters) {
@@ -163,9 +172,14 @@ OtlpResource LinuxLinkReport::resource() const {
 
 bool LinuxLinkReport::finish(std::chrono::milliseconds timeout) {
   const auto deadline = std::chrono::steady_clock::now() + timeout;
-  for (const auto& [url, exporter] : exporters_) exporter->beginEnd();
+  std::vector<OtlpExporter*> exporters;
+  {
+    const MutexLock lock(mutex_);
+    for (const auto& [url, exporter] : exporters_) exporters.push_back(exporter.get());
+  }
+  for (OtlpExporter* exporter : exporters) exporter->beginEnd();
   bool isDone = true;
-  for (const auto& [url, exporter] : exporters_) isDone = exporter->waitForEnd(deadline) && isDone;
+  for (OtlpExporter* exporter : exporters) isDone = exporter->waitForEnd(deadline) && isDone;
   return isDone;
 }
 

@@ -12,6 +12,7 @@
 #include "platform/LinkReport.h"
 #include "platform/linux/files/Ulid.h"
 #include "platform/linux/otlp/OtlpExporter.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -58,6 +59,7 @@ class LinuxLinkReport final : public LinkReport {
  private:
   class Session;
 
+  std::string nextIdentifier(double now);
   // The backends that the domain's `preferences` name. Logs new problems.
   LinkReportBackends backendsOf(const ValueMap& preferences);
   // Null if there are already kMaxExporters exporters.
@@ -71,9 +73,13 @@ class LinuxLinkReport final : public LinkReport {
   const OtlpResource ownResource_;
   const HttpClientMaker makeClient_;
   const OtlpOutbox::Limits limits_;
-  UlidGenerator identifiers_;
-  std::string loggedProblems_;
-  std::map<std::string, std::unique_ptr<OtlpExporter>> exporters_;  // by URL
+
+  Mutex identifiersMutex_;  // never held for long
+  UlidGenerator identifiers_ GUARDED_BY(identifiersMutex_);
+  Mutex mutex_;
+  std::string loggedProblems_ GUARDED_BY(mutex_);
+  // By URL. None is removed before the service ends.
+  std::map<std::string, std::unique_ptr<OtlpExporter>> exporters_ GUARDED_BY(mutex_);
 };
 
 }  // namespace tonewerk

@@ -30,7 +30,7 @@ StoreRowText::StoreRowText(const PowerRow& row) : text_(emptyText()) {
 StoreRowText::StoreRowText(const RtcSessionRow& /*row*/) : text_(emptyText()) {}
 
 StoreRowText::StoreRowText(const RtcMessageRow& row) : text_(emptyText()) {
-  appendCompactJson(text_, row.payload);
+  appendCompactJson(text_, row.payload, row.hidden);
 }
 
 StoreRowText::~StoreRowText() {

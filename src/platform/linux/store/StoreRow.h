@@ -5,6 +5,7 @@
 #include <cstdint>
 #include <memory>
 #include <string>
+#include <string_view>
 
 #include "platform/Metricon.h"
 #include "values/Value.h"
@@ -68,6 +69,7 @@ struct RtcMessageRow {
   std::uint16_t category = 0;
   std::uint16_t type = 0;
   ValueMap payload;
+  std::string_view hidden = {};  // the store does not take this entry of the payload; empty for none
 };
 
 }  // namespace tonewerk

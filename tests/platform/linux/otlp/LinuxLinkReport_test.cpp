@@ -42,7 +42,7 @@ class LinuxLinkReportTest : public testing::Test {
     return session;
   }
   bool send(LinkReportSession& session, const ValueMap& payload) {
-    return session.sendMessageWithCategory(4, 2, payload, problem_);
+    return session.sendMessageWithCategory(4, 2, {payload}, problem_);
   }
   // Opens the store after all recorded rows have been written.
   void openStore(SqliteDatabase& database) {

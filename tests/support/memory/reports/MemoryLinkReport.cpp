@@ -40,13 +40,15 @@ class MemoryLinkReport::MemorySession final : public LinkReportSession {
   }
 
   [[nodiscard]] bool sendMessageWithCategory(std::uint16_t category, std::uint16_t type,
-                                             const ValueMap& payload, std::string& problem) override {
+                                             const Payload& payload, std::string& problem) override {
     const MutexLock lock(state_->mutex);
     if (state_->problem) {
       problem = *state_->problem;
       return false;
     }
-    session_->messages.push_back({category, type, payload});
+    ValueMap sent = payload.entries;
+    if (!payload.hidden.empty()) sent.erase(payload.hidden);
+    session_->messages.push_back({category, type, std::move(sent)});
     return true;
   }
 
