@@ -41,8 +41,31 @@ class Checker {
   std::optional<std::string_view> key();
   // Checks that a key's characters are allowed.
   bool isValidKey(std::string_view key);
+  // The same for a key of less than 32 bytes, as most are; none for any other, and behind the last byte.
+  std::optional<std::string_view> shortKey() {
+    if (isAtEnd()) return std::nullopt;
+    const std::uint8_t first = byteAt(at_);
+    const std::size_t size = first & 0x1FU;
+    if ((first & 0xE0U) != encoding::kFixedText || size >= left()) return std::nullopt;
+    const std::string_view key(at_ + 1, size);
+    at_ += 1 + size;
+    return key;
+  }
   // Goes behind the next value. False after a problem, and for an array or a map that is left to a tree.
   bool value();
+  // Goes behind a number, a boolean or a short ASCII text, as most values are; false for any other value, and
+  // behind the last byte.
+  bool shortValue() {
+    if (isAtEnd()) return false;
+    const std::uint8_t first = byteAt(at_);
+    const std::size_t number = encoding::kNumberLengths[first];
+    const bool isShortText = (first & 0xE0U) == encoding::kFixedText;
+    const std::size_t length = isShortText ? 1 + (first & 0x1FU) : number;
+    if (length == 0 || length > left()) return false;
+    if (isShortText && !isAscii({at_ + 1, length - 1})) return false;
+    at_ += length;
+    return true;
+  }
 
  private:
   std::size_t left() const { return static_cast<std::size_t>(end_ - at_); }
@@ -198,7 +221,8 @@ PackedMapReader::Read PackedMapReader::pack(std::string_view bytes, ShapeTable& 
   char* end = values_.data();
   ShapeTable::Place place = ShapeTable::root();
   for (std::size_t left = *entries; left > 0; --left) {
-    const std::optional<std::string_view> key = checker.key();
+    std::optional<std::string_view> key = checker.shortKey();
+    if (!key) key = checker.key();
     if (!key) return stopped();
     ShapeTable::Place next = shapes.find(place, *key);
     if (next == ShapeTable::none()) {
@@ -208,7 +232,7 @@ PackedMapReader::Read PackedMapReader::pack(std::string_view bytes, ShapeTable& 
     }
     place = next;
     const char* const value = checker.at();
-    if (!checker.value()) return stopped();
+    if (!checker.shortValue() && !checker.value()) return stopped();
     end = copyValue(end, value, static_cast<std::size_t>(checker.at() - value), bytes);
   }
   if (!checker.isAtEnd()) return {};

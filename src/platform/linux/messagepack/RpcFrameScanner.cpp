@@ -130,6 +130,7 @@ RpcFrameScanner::Result RpcFrameScanner::scanHead(std::string_view bytes) {
 
 RpcFrameScanner::Result RpcFrameScanner::scanArguments(std::string_view bytes) {
   for (;;) {
+    if (depth_ > kArgumentsDepth) skipShortValues(bytes);
     while (missing_[depth_] == 0) {
       if (--depth_ < kArgumentsDepth) return endFrame(bytes);
     }
@@ -146,6 +147,20 @@ RpcFrameScanner::Result RpcFrameScanner::scanArguments(std::string_view bytes) {
     if (depth_ == kMaxFrameDepth) return broken("a frame nested too deep");
     missing_[++depth_] = isMap ? 2 * value->count : value->count;
   }
+}
+
+// Nearly all values inside of arguments are numbers and short texts, whose first byte says how long they are.
+void RpcFrameScanner::skipShortValues(std::string_view bytes) {
+  const char* at = bytes.data() + at_;
+  const char* const end = bytes.data() + bytes.size();
+  std::uint64_t missing = missing_[depth_];
+  for (; missing > 0 && at < end; --missing) {
+    const std::size_t length = encoding::kFixedLengths[encoding::byteAt(at)];
+    if (length == 0 || length > static_cast<std::size_t>(end - at)) break;
+    at += length;
+  }
+  missing_[depth_] = missing;
+  at_ = static_cast<std::size_t>(at - bytes.data());
 }
 
 void RpcFrameScanner::noteArgument() {

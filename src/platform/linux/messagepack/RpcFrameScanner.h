@@ -51,6 +51,7 @@ class RpcFrameScanner {
 
   [[nodiscard]] Result scanHead(std::string_view bytes);
   void noteArgument();
+  void skipShortValues(std::string_view bytes);
   [[nodiscard]] Result scanArguments(std::string_view bytes);
   [[nodiscard]] Result endFrame(std::string_view bytes);
   [[nodiscard]] Result needMore(std::string_view bytes);
