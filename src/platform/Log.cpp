@@ -63,20 +63,21 @@ void log_detail::write(LogLevel level, const LogSite& site, std::string_view for
                        std::span<const Argument> arguments) {
   std::string message = logPrefix(site.file, site.line);
   auto argument = arguments.begin();
-  for (std::size_t at = 0; at < format.size(); ++at) {
-    if (format[at] != '%' || at + 1 == format.size()) {
-      message += format[at];
-      continue;
-    }
-    ++at;
+  while (!format.empty()) {
+    const std::size_t percent = format.find('%');
+    const bool isLast = percent == std::string_view::npos || percent + 1 == format.size();
+    message += isLast ? format : format.substr(0, percent);
+    if (isLast) break;
+    std::size_t at = percent + 1;
     if (format[at] == '%') {
       message += '%';
-      continue;
+    } else {
+      while (isLengthModifier(format[at])) ++at;
+      assert(argument != arguments.end());
+      argument->append(message, argument->object, format[at]);
+      ++argument;
     }
-    while (isLengthModifier(format[at])) ++at;
-    assert(argument != arguments.end());
-    argument->append(message, argument->object, format[at]);
-    ++argument;
+    format.remove_prefix(at + 1);
   }
   site.category->write(level, message);
 }

@@ -31,6 +31,10 @@ class Log {
   // because it runs for every line before the line is formatted.
   virtual bool isEnabled(std::string_view category, LogLevel level) const = 0;
 
+  // Returns the lowest level that is written of this category, when it stays the same as long as the log
+  // lives. None when isEnabled() is to be asked for each line.
+  virtual std::optional<LogLevel> fixedThreshold(std::string_view /*category*/) const { return std::nullopt; }
+
   // Writes `message`, which includes the prefix. `subsystem` is for example "com.orvane.tonewerk". It reports
   // no failure: a line that cannot be written is lost.
   virtual void write(std::string_view subsystem, std::string_view category, LogLevel level,
@@ -42,11 +46,13 @@ class LogCategory {
  public:
   // `log` outlives the category.
   LogCategory(Log& log, std::string_view subsystem, std::string_view code)
-      : log_(log), subsystem_(subsystem), code_(code) {}
+      : log_(log), subsystem_(subsystem), code_(code), threshold_(log.fixedThreshold(code)) {}
   LogCategory(const LogCategory&) = delete;
   LogCategory& operator=(const LogCategory&) = delete;
 
-  bool isEnabled(LogLevel level) const { return log_.isEnabled(code_, level); }
+  bool isEnabled(LogLevel level) const {
+    return threshold_ ? level >= *threshold_ : log_.isEnabled(code_, level);
+  }
   void write(LogLevel level, std::string_view message) const {
     log_.write(subsystem_, code_, level, message);
   }
@@ -61,6 +67,7 @@ class LogCategory {
   Log& log_;
   const std::string subsystem_;
   const std::string code_;
+  const std::optional<LogLevel> threshold_;
 };
 
 // The functions below write log lines in the daemon's own form: "%25s:%-5d " of source file and line, then a

@@ -4,6 +4,7 @@
 #include <chrono>
 #include <cstdint>
 #include <memory>
+#include <optional>
 #include <string>
 
 #include "platform/Log.h"
@@ -30,6 +31,9 @@ class CondensingLog final : public Log {
 
   bool isEnabled(std::string_view category, LogLevel level) const override {
     return log_->isEnabled(category, level);
+  }
+  std::optional<LogLevel> fixedThreshold(std::string_view category) const override {
+    return log_->fixedThreshold(category);
   }
   void write(std::string_view subsystem, std::string_view category, LogLevel level,
              std::string_view message) override;

@@ -26,6 +26,9 @@ class JournalLog final : public Log {
   bool isEnabled(std::string_view category, LogLevel level) const override {
     return threshold_.isEnabled(category, level);
   }
+  std::optional<LogLevel> fixedThreshold(std::string_view category) const override {
+    return threshold_.of(category);
+  }
   void write(std::string_view subsystem, std::string_view category, LogLevel level,
              std::string_view message) override;
 

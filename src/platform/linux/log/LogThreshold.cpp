@@ -45,11 +45,11 @@ std::optional<LogThreshold> LogThreshold::parse(std::string_view text, std::stri
   return threshold;
 }
 
-bool LogThreshold::isEnabled(std::string_view category, LogLevel level) const {
+LogLevel LogThreshold::of(std::string_view category) const {
   for (const auto& [name, own] : categories_) {
-    if (name == category) return level >= own;
+    if (name == category) return own;
   }
-  return level >= level_;
+  return level_;
 }
 
 void LogThreshold::set(std::string_view category, LogLevel level) {

@@ -23,7 +23,9 @@ class LogThreshold {
   [[nodiscard]] static std::optional<LogThreshold> parse(std::string_view text, std::string& problem);
 
   // Compares the category with each that has its own level. Allocates nothing.
-  bool isEnabled(std::string_view category, LogLevel level) const;
+  bool isEnabled(std::string_view category, LogLevel level) const { return level >= of(category); }
+  // The lowest level that is written.
+  LogLevel of(std::string_view category) const;
 
  private:
   void set(std::string_view category, LogLevel level);

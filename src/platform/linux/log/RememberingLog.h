@@ -2,6 +2,7 @@
 #pragma once
 
 #include <memory>
+#include <optional>
 
 #include "platform/Log.h"
 
@@ -20,6 +21,9 @@ class RememberingLog final : public Log {
 
   bool isEnabled(std::string_view category, LogLevel level) const override {
     return log_->isEnabled(category, level);
+  }
+  std::optional<LogLevel> fixedThreshold(std::string_view category) const override {
+    return log_->fixedThreshold(category);
   }
   void write(std::string_view subsystem, std::string_view category, LogLevel level,
              std::string_view message) override;

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <optional>
 #include <string>
 
 #include "platform/Clock.h"
@@ -24,6 +25,9 @@ class StreamLog final : public Log {
 
   bool isEnabled(std::string_view category, LogLevel level) const override {
     return threshold_.isEnabled(category, level);
+  }
+  std::optional<LogLevel> fixedThreshold(std::string_view category) const override {
+    return threshold_.of(category);
   }
   void write(std::string_view subsystem, std::string_view category, LogLevel level,
              std::string_view message) override;
