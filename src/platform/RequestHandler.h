@@ -5,7 +5,10 @@
 #include <cstdint>
 #include <memory>
 #include <optional>
+#include <utility>
+#include <vector>
 
+#include "protocol/AudioEvent.h"
 #include "protocol/RequestSet.h"
 #include "values/Value.h"
 
@@ -73,6 +76,16 @@ class InFlightToken {
   std::size_t bytes_ = 0;
 };
 
+// A client's message: the parameters of the request that carries one.
+struct IncomingMessage {
+  ValueMap payload;
+  AudioEventCategory category = 0;
+  AudioEventType type = 0;
+  std::optional<std::vector<ReporterID>> reporterIDs;  // none for nil
+
+  Arguments arguments() const;
+};
+
 // Requests of one connection that arrived together and are not decoded yet.
 class ReceivedRequests {
  public:
@@ -93,6 +106,12 @@ class RequestHandler {
   // Handles one request. `method` is the index in the request set; `arguments` fit the method. Runs on the
   // messaging thread and must not block, unless handleReceived() delivers on another thread.
   virtual void handleRequest(std::size_t method, Arguments arguments, Reply reply, InFlightToken token) = 0;
+
+  // Handles one request whose method carries a message; the payload may be moved away. Does what
+  // handleRequest() does with the same arguments.
+  virtual void handleMessage(std::size_t method, IncomingMessage& message, Reply reply, InFlightToken token) {
+    handleRequest(method, message.arguments(), std::move(reply), std::move(token));
+  }
 
   // Runs on the messaging thread and must not block: delivers the requests, or sees that another thread does,
   // in the order of these calls. A transport that decodes on its own thread calls handleRequest() instead.

@@ -65,6 +65,9 @@ struct Method {
   // Whether the method changes sessions or the daemon instead of only reading. A connection that only
   // observes may not call it.
   bool changesState = false;
+  // Whether the parameters are those of IncomingMessage, in its order. Transports may then take a shorter
+  // way, because messages come far more often than all other requests.
+  bool carriesMessage = false;
 };
 
 // Lists the requests that a handler understands. A request names its method by the index in `methods`.

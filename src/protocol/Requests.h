@@ -48,7 +48,8 @@ inline constexpr Method kSendMessage{.name = "sendMessage",
                                                     {"category", ParameterType::kUInt32},
                                                     {"type", ParameterType::kUInt16},
                                                     {"reporterIDs", ParameterType::kInt64ListOrNone}},
-                                     .changesState = true};
+                                     .changesState = true,
+                                     .carriesMessage = true};
 inline constexpr Method kStopReportingSessionForID{.name = "stopReportingSessionForID",
                                                    .parameters = {kReporterID},
                                                    .result = kSuccess,

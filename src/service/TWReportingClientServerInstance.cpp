@@ -150,7 +150,7 @@ void TWReportingClientServerInstance::startReportingSessionForID(ReporterID repo
 }
 
 void TWReportingClientServerInstance::sendMessage(ValueMap message, AudioEventCategory messageCategory,
-                                                  AudioEventType type, ReporterIDs reporterIDs,
+                                                  AudioEventType type, const ReporterIDs& reporterIDs,
                                                   ServiceRequest request) {
   if (reporterIDs && reporterIDs->size() > kMaxSessions) {
     return request.reply(
@@ -163,26 +163,42 @@ void TWReportingClientServerInstance::sendMessage(ValueMap message, AudioEventCa
       message.set(kSendSingleMessage, true);
     }
   }
-  onWorkQueue(std::move(request),
-              [message = std::move(message), messageCategory, type, reporterIDs = std::move(reporterIDs)](
-                  auto&, auto& delegate, const Reply& reply) mutable {
-                const TracedRequest traced(TWReportingTracePoint::kRequestSend);
-                debugLog(category(), "sending message for reporter %@", reporterIDs);
-                if (!delegate.isReportingEnabled()) {
-                  return reply(ReplyError{std::string(kReportingErrorDomain), kReportingDisabled, ""});
-                }
-                const auto send = [&](const Session& session, ValueMap payload) {
-                  const auto record =
-                      std::make_shared<TWReportingSessionMessage>(std::move(payload), messageCategory, type);
-                  session->sendMessage(record);
-                  delegate.messageTap().note(*session, *record);
-                };
-                std::vector<Session> sessions = delegate.findReportingSessionsForIDs(reporterIDs);
-                // The last session gets the only reference and can change the message without a copy.
-                for (std::size_t at = 0; at + 1 < sessions.size(); ++at) send(sessions[at], message);
-                if (!sessions.empty()) send(sessions.back(), std::move(message));
-                reply(std::nullopt);
-              });
+  if (TWReportingUtilityGetReportingServerQueue().isCurrent()) {
+    const Delegate delegate = delegate_.lock();
+    if (delegate == nullptr) return;
+    return deliver(*delegate, std::move(message), messageCategory, type, reporterIDs, request.reply);
+  }
+  onWorkQueue(std::move(request), [message = std::move(message), messageCategory, type, reporterIDs](
+                                      auto&, auto& delegate, const Reply& reply) mutable {
+    deliver(delegate, std::move(message), messageCategory, type, reporterIDs, reply);
+  });
+}
+
+void TWReportingClientServerInstance::deliver(TWReportingServiceDelegateProtocol& delegate, ValueMap message,
+                                              AudioEventCategory messageCategory, AudioEventType type,
+                                              const ReporterIDs& reporterIDs, const Reply& reply) {
+  const TracedRequest traced(TWReportingTracePoint::kRequestSend);
+  debugLog(category(), "sending message for reporter %@", reporterIDs);
+  if (!delegate.isReportingEnabled()) {
+    return reply(ReplyError{std::string(kReportingErrorDomain), kReportingDisabled, ""});
+  }
+  const auto send = [&](const Session& session, ValueMap payload) {
+    const auto record =
+        std::make_shared<TWReportingSessionMessage>(std::move(payload), messageCategory, type);
+    session->sendMessage(record);
+    delegate.messageTap().note(*session, *record);
+  };
+  if (reporterIDs && reporterIDs->size() == 1) {  // nearly always; without a list of sessions
+    const ReporterID only = reporterIDs->front();
+    const Session session = only == 0 ? nullptr : delegate.findReportingSessionForID(only);
+    if (session != nullptr) send(session, std::move(message));
+    return reply(std::nullopt);
+  }
+  std::vector<Session> sessions = delegate.findReportingSessionsForIDs(reporterIDs);
+  // The last session gets the only reference and can change the message without a copy.
+  for (std::size_t at = 0; at + 1 < sessions.size(); ++at) send(sessions[at], message);
+  if (!sessions.empty()) send(sessions.back(), std::move(message));
+  reply(std::nullopt);
 }
 
 void TWReportingClientServerInstance::stopReportingSessionForID(ReporterID reporterID,

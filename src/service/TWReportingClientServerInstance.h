@@ -51,7 +51,7 @@ class TWReportingClientServerInstance final
   void setConfiguration(ValueMap configuration, ReporterID reporterID, ServiceRequest request) override;
   void startReportingSessionForID(ReporterID reporterID, ServiceRequest request) override;
   void sendMessage(ValueMap message, AudioEventCategory category, AudioEventType type,
-                   ReporterIDs reporterIDs, ServiceRequest request) override;
+                   const ReporterIDs& reporterIDs, ServiceRequest request) override;
   void stopReportingSessionForID(ReporterID reporterID, ServiceRequest request) override;
   void destroyReportingSession(ReporterID reporterID, ServiceRequest request) override;
   void reporterIDValid(ReporterID reporterID, ServiceRequest request) override;
@@ -89,6 +89,11 @@ class TWReportingClientServerInstance final
  private:
   using Delegate = std::shared_ptr<TWReportingServiceDelegateProtocol>;
   using Session = std::shared_ptr<TWReportingSession>;
+
+  // Sends the message to the sessions, and replies. On the work queue.
+  static void deliver(TWReportingServiceDelegateProtocol& delegate, ValueMap message,
+                      AudioEventCategory messageCategory, AudioEventType type, const ReporterIDs& reporterIDs,
+                      const Reply& reply);
 
   // Runs `body` with this object, the delegate and the reply: at once on the work queue, else queued there.
   template <typename Body>

@@ -51,10 +51,10 @@ void sendMessage(const Targets& to, Incoming& in) {
   ValueMap message = *in.arguments[0]->asMap();
   const auto category = static_cast<AudioEventCategory>(in.arguments[1]->integer());
   const auto type = static_cast<AudioEventType>(in.arguments[2]->integer());
-  auto identifiers = reporterIDsOf(in.arguments[3]);
+  const auto identifiers = reporterIDsOf(in.arguments[3]);
   // Cleared first, so that nothing shares the message's storage and the session can change it without a copy.
   in.arguments.clear();
-  to.service.sendMessage(std::move(message), category, type, std::move(identifiers), in.request());
+  to.service.sendMessage(std::move(message), category, type, identifiers, in.request());
 }
 
 struct Handler {
@@ -167,6 +167,13 @@ bool TWReportingServiceExport::isUrgent(std::size_t method) {
   const std::string_view name = requests::kAll[method].name;
   if (name == requests::kObserve.name) hasAskedToObserve_ = true;
   return name == requests::kKillService.name && (!hasAskedToObserve_ || role_ == Role::kClient);
+}
+
+void TWReportingServiceExport::handleMessage(std::size_t method, IncomingMessage& message, Reply reply,
+                                             InFlightToken token) {
+  if (const std::optional<ReplyError> error = takeRole(requests::kAll[method])) return reply(error);
+  object_->sendMessage(std::move(message.payload), message.category, message.type, message.reporterIDs,
+                       {std::move(reply), std::move(token)});
 }
 
 void TWReportingServiceExport::handleRequest(std::size_t method, Arguments arguments, Reply reply,

@@ -29,6 +29,7 @@ class TWReportingServiceExport final : public RequestHandler {
   // `method`: the index in requests::all(). Runs on the work queue or, for transports that decode themselves
   // and for urgent requests, on the messaging thread.
   void handleRequest(std::size_t method, Arguments arguments, Reply reply, InFlightToken token) override;
+  void handleMessage(std::size_t method, IncomingMessage& message, Reply reply, InFlightToken token) override;
   // Has the work queue deliver the requests, so that no value is made on one thread and freed on another.
   void handleReceived(std::unique_ptr<ReceivedRequests> requests) override;
   ShapeTable* shapes() override { return shapes_.get(); }

@@ -36,7 +36,7 @@ class TWReportingServiceProtocol {
   // Sends to the named sessions; without names to every started session, or else to the single-message
   // session.
   virtual void sendMessage(ValueMap message, AudioEventCategory category, AudioEventType type,
-                           ReporterIDs reporterIDs, ServiceRequest request) = 0;
+                           const ReporterIDs& reporterIDs, ServiceRequest request) = 0;
   virtual void stopReportingSessionForID(ReporterID reporterID, ServiceRequest request) = 0;
   virtual void destroyReportingSession(ReporterID reporterID, ServiceRequest request) = 0;
   virtual void reporterIDValid(ReporterID reporterID, ServiceRequest request) = 0;

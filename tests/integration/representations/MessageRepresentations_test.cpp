@@ -78,8 +78,12 @@ class MessageRepresentationsTest : public ReportingTest {
                                                       AudioEventType type) {
       RpcFrameScanner scanner;
       EXPECT_EQ(scanner.scan(bytes), RpcFrameScanner::Result::kFrame);
-      RpcFrame& frame =
-          decoder.decode({bytes, scanner.frame().argumentCount, scanner.frame().arguments}, shapes.get());
+      if (shapes != nullptr) {
+        IncomingMessage* const packed =
+            decoder.decodeMessage({bytes, scanner.frame().argumentCount, scanner.frame().arguments}, *shapes);
+        if (packed != nullptr) return message(std::move(packed->payload), category, type);
+      }
+      RpcFrame& frame = decoder.decode(bytes);
       if (frame.refused) return nullptr;
       return message(*frame.arguments.front()->asMap(), category, type);
     }

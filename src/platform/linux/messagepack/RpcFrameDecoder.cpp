@@ -2,71 +2,83 @@
 #include "platform/linux/messagepack/RpcFrameDecoder.h"
 
 #include <cassert>
+#include <concepts>
+#include <cstdint>
+#include <limits>
 #include <msgpack.hpp>
+#include <type_traits>
 #include <utility>
-#include <vector>
 
-#include "values/EncodedValue.h"
 #include "values/ShapeTable.h"
 
 namespace tonewerk {
+namespace {
 
-RpcFrame& RpcFrameDecoder::decode(const Frame& frame, ShapeTable* shapes) {
-  if (shapes != nullptr && decodePacked(frame, *shapes)) return packed_;
+constexpr std::size_t kMessageArguments = 4;
+constexpr std::size_t kMaxKeptIdentifiers = 1024;
+static_assert(RpcFrameScanner::kMaxKnownArguments >= kMessageArguments);
+
+// Reads an integer within the range of Number. Returns false for anything else.
+template <std::integral Number>
+[[nodiscard]] bool readInteger(EncodedValue value, Number& out) {
+  return value.isNumber() && encoding::visitNumber(value.begin(), [&out](auto number) {
+           if constexpr (std::is_same_v<decltype(number), bool> ||
+                         std::is_floating_point_v<decltype(number)>) {
+             return false;
+           } else {
+             if (!std::in_range<Number>(number)) return false;
+             out = static_cast<Number>(number);
+             return true;
+           }
+         });
+}
+
+}  // namespace
+
+RpcFrame& RpcFrameDecoder::decode(std::string_view bytes) {
   visitor_.init();
   std::size_t end = 0;
-  [[maybe_unused]] const bool isFrame = msgpack::parse(frame.bytes.data(), frame.bytes.size(), end, visitor_);
-  assert(isFrame && end == frame.bytes.size());
-  visitor_.frame().wireBytes = frame.bytes.size();
+  [[maybe_unused]] const bool isFrame = msgpack::parse(bytes.data(), bytes.size(), end, visitor_);
+  assert(isFrame && end == bytes.size());
+  visitor_.frame().wireBytes = bytes.size();
   return visitor_.frame();
 }
 
-bool RpcFrameDecoder::decodePacked(const Frame& frame, ShapeTable& shapes) {
-  const std::size_t count = frame.argumentCount;
-  if (count == 0 || count > frame.arguments.size()) return false;
-  if (!encoding::isMap(encoding::byteAt(frame.bytes.data() + frame.arguments[0]))) return false;
-  packed_.arguments.clear();
-  packed_.arguments.reserve(count);
-  packed_.refused.reset();
-  packed_.wireBytes = frame.bytes.size();
-  for (std::size_t index = 0; index < count; ++index) {
-    const std::size_t begin = frame.arguments[index];
-    const std::size_t end = index + 1 < count ? frame.arguments[index + 1] : frame.bytes.size();
-    if (!addArgument(frame.bytes.substr(begin, end - begin), shapes)) {
-      packed_.arguments.clear();  // which would hold memory until the next packed frame
-      return false;
-    }
+IncomingMessage* RpcFrameDecoder::decodeMessage(const Frame& frame, ShapeTable& shapes) {
+  if (frame.argumentCount != kMessageArguments) return nullptr;
+  const auto argument = [&frame](std::size_t at) {
+    return EncodedValue(frame.bytes.data() + frame.arguments[at]);
+  };
+  if (!readInteger(argument(1), message_.category) || !readInteger(argument(2), message_.type) ||
+      !readReporterIDs(argument(3))) {
+    return nullptr;
   }
-  return true;
+  const std::size_t payloadBytes = frame.arguments[1] - frame.arguments[0];
+  PackedMapReader::Read read = reader_.read(frame.bytes.substr(frame.arguments[0], payloadBytes), shapes);
+  if (read.result != PackedMapReader::Result::kPacked) return nullptr;
+  message_.payload = std::move(read.map);
+  return &message_;
 }
 
-bool RpcFrameDecoder::addArgument(std::string_view bytes, ShapeTable& shapes) {
-  const std::uint8_t first = encoding::byteAt(bytes.data());
-  const EncodedValue value(bytes.data());
-  if (encoding::isMap(first)) {
-    PackedMapReader::Read read = reader_.read(bytes, shapes);
-    if (read.result == PackedMapReader::Result::kTree) return false;
-    if (read.result == PackedMapReader::Result::kRefused && !packed_.refused) {
-      packed_.refused = RefusedValue{packed_.arguments.size(), read.refused};
-    }
-    packed_.arguments.emplace_back(std::move(read.map));
-  } else if (first == encoding::kNil) {
-    packed_.arguments.emplace_back();
-  } else if (value.isNumber()) {
-    packed_.arguments.emplace_back(value.scalar());
-  } else if (encoding::isArray(first)) {
-    std::vector<Value> numbers;
-    bool areNumbers = true;
-    forEachElement(value, [&](EncodedValue element) {
-      areNumbers = areNumbers && element.isNumber();
-      if (areNumbers) numbers.push_back(element.scalar());
-    });
-    if (!areNumbers) return false;
-    packed_.arguments.emplace_back(ValueArray(std::move(numbers)));
-  } else {
-    return false;
+bool RpcFrameDecoder::readReporterIDs(EncodedValue list) {
+  const std::uint8_t first = encoding::byteAt(list.begin());
+  if (!encoding::isArray(first)) {
+    message_.reporterIDs.reset();
+    return first == encoding::kNil;
   }
-  return true;
+  // The vector is used again, unless it is large.
+  if (!message_.reporterIDs || message_.reporterIDs->capacity() > kMaxKeptIdentifiers) {
+    message_.reporterIDs.emplace();
+  }
+  std::vector<ReporterID>& identifiers = *message_.reporterIDs;
+  identifiers.clear();
+  bool areIdentifiers = true;
+  forEachElement(list, [&](EncodedValue element) {
+    ReporterID identifier = 0;
+    areIdentifiers = areIdentifiers && readInteger(element, identifier);
+    if (areIdentifiers) identifiers.push_back(identifier);
+  });
+  return areIdentifiers;
 }
 
 }  // namespace tonewerk

@@ -7,10 +7,12 @@
 #include <optional>
 #include <string_view>
 
+#include "platform/RequestHandler.h"
 #include "platform/linux/messagepack/PackedMapReader.h"
 #include "platform/linux/messagepack/RpcFrameReader.h"
 #include "platform/linux/messagepack/RpcFrameScanner.h"
 #include "platform/linux/messagepack/RpcFrameVisitor.h"
+#include "values/EncodedValue.h"
 
 namespace tonewerk {
 
@@ -18,8 +20,8 @@ class ShapeTable;
 
 // Builds the values of frames that an RpcFrameScanner has found. One thread at a time.
 //
-// With a table of shapes, maps among the arguments become packed where the table has room for their keys. All
-// other frames go through the visitor, which builds trees; the values and the refusals are the same.
+// Messages get a payload that is packed where a table of shapes has room for its keys. All other frames go
+// through the visitor, which builds trees.
 class RpcFrameDecoder {
  public:
   using ArgumentOffsets = std::array<std::uint32_t, RpcFrameScanner::kMaxKnownArguments>;
@@ -31,20 +33,20 @@ class RpcFrameDecoder {
     ArgumentOffsets arguments{};
   };
 
-  // `shapes` may be null. The result is valid until the next call, and may be moved from. Its method is empty
-  // when the frame did not go through the visitor.
-  RpcFrame& decode(const Frame& frame, ShapeTable* shapes);
-  RpcFrame& decode(std::string_view bytes) { return decode({bytes}, nullptr); }
+  // The results are valid until the next call, and may be moved from.
+  RpcFrame& decode(std::string_view bytes);
+  // Decodes a request that carries a message. Null when its arguments do not fit, when a value is refused and
+  // when the payload cannot be packed: decode() then says what is wrong, or makes a tree of the same values.
+  IncomingMessage* decodeMessage(const Frame& frame, ShapeTable& shapes);
 
  private:
-  // Returns false when the frame is one for the visitor.
-  [[nodiscard]] bool decodePacked(const Frame& frame, ShapeTable& shapes);
-  [[nodiscard]] bool addArgument(std::string_view bytes, ShapeTable& shapes);
+  // Reads the sessions' identifiers, or nil.
+  [[nodiscard]] bool readReporterIDs(EncodedValue list);
 
   RpcStrings texts_;
   RpcFrameVisitor visitor_{texts_};
   PackedMapReader reader_;
-  RpcFrame packed_;
+  IncomingMessage message_;
 };
 
 }  // namespace tonewerk

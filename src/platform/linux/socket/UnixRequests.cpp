@@ -64,7 +64,12 @@ void UnixRequests::deliver(RpcFrameDecoder& decoder, ShapeTable* shapes) {
 void UnixRequests::deliver(const Request& request, RpcFrameDecoder& decoder, ShapeTable* shapes) {
   InFlightToken token(context_->window, bytesOf(request));
   Reply reply = request.isNotification ? Reply() : Reply(context_->outbox, request.identifier);
-  RpcFrame& frame = decoder.decode(request.frame, request.method ? shapes : nullptr);
+  if (shapes != nullptr && request.method && context_->methods.methods[*request.method].carriesMessage) {
+    if (IncomingMessage* message = decoder.decodeMessage(request.frame, *shapes)) {
+      return context_->handler->handleMessage(*request.method, *message, std::move(reply), std::move(token));
+    }
+  }
+  RpcFrame& frame = decoder.decode(request.frame.bytes);
   if (const auto problem = problemWith(request, frame)) return reply(problem);
   context_->handler->handleRequest(*request.method, std::move(frame.arguments), std::move(reply),
                                    std::move(token));
