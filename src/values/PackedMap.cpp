@@ -40,9 +40,22 @@ std::vector<EncodedValue> valuesOf(const PackedMap& map) {
 PackedMap::PackedMap(const Shape& shape, std::size_t size, bool isInChunk)
     : size_(static_cast<std::uint32_t>(size) & kMaxValueBytes),
       isInChunk_(isInChunk ? 1 : 0),
-      shape_(shape) {}
+      tagged_(reinterpret_cast<const char*>(&shape)) {
+  static_assert(alignof(Shape) > kBeside && alignof(Beside) > kBeside);
+  shape.retain();
+}
 
-PackedMap::~PackedMap() { delete tree_.load(std::memory_order_acquire); }
+PackedMap::~PackedMap() {
+  deleteTree();
+  shape().release();
+}
+
+void PackedMap::deleteTree() {
+  const char* tagged = tagged_.load(std::memory_order_acquire);
+  if (!isBeside(tagged)) return;
+  tagged_.store(reinterpret_cast<const char*>(beside(tagged)->shape), std::memory_order_release);
+  delete beside(tagged);
+}
 
 PackedMap* PackedMap::allocate(const Shape& shape, std::size_t size, PackedChunk* chunk) {
   assert(size <= kMaxValueBytes);
@@ -72,10 +85,11 @@ Counted<PackedMap> PackedMap::make(const Shape& shape, std::string_view values, 
 
 EncodedValue PackedMap::at(std::size_t slot) const {
   assert(slot < size());
-  if (shape_->isConstant(slot)) return shape_->constant(slot);
+  const Shape& keys = shape();
+  if (keys.isConstant(slot)) return keys.constant(slot);
   EncodedValue value(begin());
   for (std::size_t before = 0; before < slot; ++before) {
-    if (!shape_->isConstant(before)) value = EncodedValue(value.end());
+    if (!keys.isConstant(before)) value = EncodedValue(value.end());
   }
   return value;
 }
@@ -86,6 +100,7 @@ bool PackedMap::equalsIgnoring(const PackedMap& other, Keys ignored) const {
 
 // Jumps to the first byte that differs, and looks at the value around it.
 bool PackedMap::hasSameValues(const PackedMap& other, Keys ignored) const {
+  const Shape& keys = shape();
   const char* own = begin();
   const char* others = other.begin();
   const char* const end = own + size_;
@@ -96,7 +111,7 @@ bool PackedMap::hasSameValues(const PackedMap& other, Keys ignored) const {
     if (own + same == end && others + same == othersEnd) return true;
     const char* const different = own + same;
     for (;; ++slot) {
-      if (shape_->isConstant(slot)) continue;
+      if (keys.isConstant(slot)) continue;
       const char* const next = EncodedValue(own).end();
       if (next > different) break;
       others += next - own;
@@ -104,50 +119,54 @@ bool PackedMap::hasSameValues(const PackedMap& other, Keys ignored) const {
     }
     const EncodedValue value(own);
     const EncodedValue another(others);
-    if (!contains(ignored, shape_->key(slot)) && !(value == another)) return false;
+    if (!contains(ignored, keys.key(slot)) && !(value == another)) return false;
     own = value.end();
     others = another.end();
   }
 }
 
 bool PackedMap::hasSameKeysAndValues(const PackedMap& other, Keys ignored) const {
+  const Shape& keys = shape();
+  const Shape& otherKeys = other.shape();
   const std::vector<EncodedValue> values = valuesOf(other);
   std::size_t common = 0;  // keys that both have, ignored ones included
   bool isEqual = true;
   forEach([&](std::size_t slot, EncodedValue value) {
     if (!isEqual) return;
-    const SharedString& key = shape_->key(slot);
-    const bool guessed = slot < other.size() && other.shape_->key(slot) == key;
-    const std::size_t place = guessed ? slot : other.shape_->find(key);
+    const SharedString& key = keys.key(slot);
+    const bool guessed = slot < otherKeys.size() && otherKeys.key(slot) == key;
+    const std::size_t place = guessed ? slot : otherKeys.find(key);
     if (place != Shape::kNoSlot) ++common;
     isEqual = (place != Shape::kNoSlot && values[place] == value) || contains(ignored, key);
   });
   if (!isEqual) return false;
-  if (common == other.size()) return true;
+  if (common == otherKeys.size()) return true;
   const auto onlyInOther = std::count_if(ignored.begin(), ignored.end(), [&](std::string_view key) {
-    return other.shape_->find(key) != Shape::kNoSlot && shape_->find(key) == Shape::kNoSlot;
+    return otherKeys.find(key) != Shape::kNoSlot && keys.find(key) == Shape::kNoSlot;
   });
-  return common + static_cast<std::size_t>(onlyInOther) == other.size();
+  return common + static_cast<std::size_t>(onlyInOther) == otherKeys.size();
 }
 
 const ValueMap& PackedMap::tree() const {
-  const ValueMap* made = tree_.load(std::memory_order_acquire);
-  if (made != nullptr) return *made;
-  auto own = std::make_unique<const ValueMap>(makeTree());
-  if (tree_.compare_exchange_strong(made, own.get(), std::memory_order_acq_rel, std::memory_order_acquire))
-    return *own.release();
-  return *made;  // another thread was faster
+  const char* tagged = tagged_.load(std::memory_order_acquire);
+  if (isBeside(tagged)) return beside(tagged)->tree;
+  auto own = std::make_unique<const Beside>(Beside{&shape(), makeTree()});
+  const char* made = reinterpret_cast<const char*>(own.get()) + kBeside;
+  if (tagged_.compare_exchange_strong(tagged, made, std::memory_order_acq_rel, std::memory_order_acquire))
+    return own.release()->tree;
+  return beside(tagged)->tree;  // another thread was faster
 }
 
 ValueMap PackedMap::toTree() const {
-  const ValueMap* made = tree_.load(std::memory_order_acquire);
-  return made == nullptr ? makeTree() : *made;
+  const char* tagged = tagged_.load(std::memory_order_acquire);
+  return isBeside(tagged) ? beside(tagged)->tree : makeTree();
 }
 
 ValueMap PackedMap::makeTree() const {
+  const Shape& keys = shape();
   ValueMap tree;
-  tree.reserve(size());
-  forEach([&](std::size_t slot, EncodedValue value) { tree.add(shape_->key(slot), value.value()); });
+  tree.reserve(keys.size());
+  forEach([&](std::size_t slot, EncodedValue value) { tree.add(keys.key(slot), value.value()); });
   return tree;
 }
 
@@ -175,23 +194,27 @@ Counted<PackedMap> PackedMap::withShape(const Shape& extended, PackedChunk* chun
 
 void PackedMap::takeShape(const Shape& extended) {
   assert(extended.base() == &shape() && !isShared());
-  delete tree_.exchange(nullptr, std::memory_order_acq_rel);
-  if (extended.variables() != shape_->variables()) {
+  deleteTree();
+  const Shape& base = shape();
+  if (extended.variables() != base.variables()) {
     size_ = static_cast<std::uint32_t>(copyFor(extended, begin()) - begin()) & kMaxValueBytes;
   }
-  shape_ = Counted<const Shape>(extended);
+  extended.retain();
+  tagged_.store(reinterpret_cast<const char*>(&extended), std::memory_order_release);
+  base.release();  // `extended` holds it, too
 }
 
 Counted<PackedMap> PackedMap::with(std::span<const Entry> entries, ShapeTable& shapes,
                                    PackedChunk* chunk) const {
-  const Shape* wanted = &shape();
+  const Shape& keys = shape();
+  const Shape* wanted = &keys;
   std::size_t size = size_;
   for (const Entry& entry : entries) {
     if (entry.slot == Shape::kNoSlot) {
       wanted = shapes.appended(*wanted, entry.key);
       if (wanted == nullptr) return {};
     } else {
-      if (shape_->isConstant(entry.slot)) return {};
+      if (keys.isConstant(entry.slot)) return {};
       size -= at(entry.slot).bytes().size();
     }
     size += entry.value.bytes().size();
@@ -203,7 +226,7 @@ Counted<PackedMap> PackedMap::with(std::span<const Entry> entries, ShapeTable& s
     to = copyBytes(to, bytes.data(), bytes.size());
   };
   forEach([&](std::size_t slot, EncodedValue value) {
-    if (shape_->isConstant(slot)) return;
+    if (keys.isConstant(slot)) return;
     for (const Entry& entry : entries) {
       if (entry.slot == slot) value = entry.value;
     }

@@ -47,13 +47,16 @@ class PackedChunk {
 // A map as a client sends it, without the keys: a shape, and the encoded values of its slots one after the
 // other. All lie in one block of memory behind a header of kHeaderBytes.
 //
-//   | holders | size | shape | tree | value | value | value ...
+//   | holders | size | shape | value | value | value ...
+//
+// A tree that is made beside the values has memory of its own, which few maps need; the header then points to
+// that, and it to the shape.
 //
 // Immutable for all who hold it. Counted by its holders, which may be on any threads. ValueMap uses it as its
 // second representation; few others need it.
 class PackedMap {
  public:
-  static constexpr std::size_t kHeaderBytes = 24;
+  static constexpr std::size_t kHeaderBytes = 16;
   static constexpr std::size_t kMaxValueBytes = (std::size_t{1} << 31U) - 1;
 
   // Takes the encoded values of all slots that are not constant; EncodedValue says what they must be. The
@@ -62,8 +65,11 @@ class PackedMap {
   PackedMap(const PackedMap&) = delete;
   PackedMap& operator=(const PackedMap&) = delete;
 
-  const Shape& shape() const { return *shape_; }
-  std::size_t size() const { return shape_->size(); }
+  const Shape& shape() const {
+    const char* tagged = tagged_.load(std::memory_order_acquire);
+    return isBeside(tagged) ? *beside(tagged)->shape : *reinterpret_cast<const Shape*>(tagged);
+  }
+  std::size_t size() const { return shape().size(); }
   std::string_view values() const { return {begin(), size_}; }
   // How long the block is.
   std::size_t bytes() const { return kHeaderBytes + size_; }
@@ -72,16 +78,17 @@ class PackedMap {
   EncodedValue at(std::size_t slot) const;
   // None when the key is absent.
   EncodedValue find(std::string_view key) const {
-    const std::size_t slot = shape_->find(key);
+    const std::size_t slot = shape().find(key);
     return slot == Shape::kNoSlot ? EncodedValue() : at(slot);
   }
   // Calls visit(slot, EncodedValue) for all slots in order.
   template <typename Visitor>
   void forEach(Visitor&& visit) const {
+    const Shape& keys = shape();
     const char* value = begin();
-    for (std::size_t slot = 0; slot < size(); ++slot) {
-      if (shape_->isConstant(slot)) {
-        visit(slot, shape_->constant(slot));
+    for (std::size_t slot = 0; slot < keys.size(); ++slot) {
+      if (keys.isConstant(slot)) {
+        visit(slot, keys.constant(slot));
       } else {
         const EncodedValue own(value);
         value = own.end();  // first, because the visitor may move the bytes
@@ -133,11 +140,26 @@ class PackedMap {
   bool hasSameValues(const PackedMap& other, Keys ignored) const;
   bool hasSameKeysAndValues(const PackedMap& other, Keys ignored) const;
 
+  // The shape together with a tree of the map.
+  struct Beside {
+    const Shape* shape;
+    ValueMap tree;
+  };
+  static constexpr std::uintptr_t kBeside = 1;
+  static bool isBeside(const char* tagged) {
+    return (reinterpret_cast<std::uintptr_t>(tagged) & kBeside) != 0;
+  }
+  static const Beside* beside(const char* tagged) {
+    return reinterpret_cast<const Beside*>(tagged - kBeside);
+  }
+  void deleteTree();
+
   mutable std::atomic<std::uint32_t> holders_{1};
   std::uint32_t size_ : 31;
   std::uint32_t isInChunk_ : 1;
-  Counted<const Shape> shape_;
-  mutable std::atomic<const ValueMap*> tree_{nullptr};
+  // Points to the shape, of which this map is a holder, or to a Beside with kBeside added, which then belongs
+  // to this map.
+  mutable std::atomic<const char*> tagged_;
 };
 
 static_assert(sizeof(PackedMap) == PackedMap::kHeaderBytes);

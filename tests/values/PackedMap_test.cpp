@@ -9,6 +9,7 @@
 #include <new>
 #include <string>
 #include <string_view>
+#include <thread>
 
 #include "values/ShapeTable.h"
 #include "values/Value.h"
@@ -97,6 +98,20 @@ TEST_F(PackedMapTest, ReadingMakesNoTree) {
   EXPECT_EQ(map.find("b"), b);
   EXPECT_EQ(map.begin() + 1, map.end() - 1);
   EXPECT_EQ(map.bytes(), bytes);
+}
+
+TEST_F(PackedMapTest, HasOneTreeForAllThreads) {
+  for (int round = 0; round < 100; ++round) {
+    const ValueMap map = packed({{"a", round}, {"b", "text"}});
+    const Value* other = nullptr;
+    std::thread thread([&] { other = map.find("b"); });
+    const Value* own = map.find("b");
+    const std::int64_t a = map.view("a").integer();  // while the other thread may put the tree beside it
+    thread.join();
+    EXPECT_EQ(own, other);
+    EXPECT_EQ(a, round);
+    EXPECT_EQ(map.shape()->size(), 2U);
+  }
 }
 
 TEST_F(PackedMapTest, ExtendsInPlaceWhenItIsTheOnlyOne) {
