@@ -53,8 +53,7 @@ std::optional<ReplacedDate> replacedDate(ValueView time) {
   return std::nullopt;
 }
 
-bool contains(const std::vector<const TWReportingSessionWorkerClass*>& classes,
-              const TWReportingSessionWorkerClass& wanted) {
+bool contains(const WorkerClassList& classes, const TWReportingSessionWorkerClass& wanted) {
   return std::find(classes.begin(), classes.end(), &wanted) != classes.end();
 }
 

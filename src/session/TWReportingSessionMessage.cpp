@@ -70,12 +70,12 @@ void TWReportingSessionMessage::sortMessages(TWReportingSessionMessages& message
 }
 
 void TWReportingSessionMessage::lock() const {
-  while (locked_.test_and_set(std::memory_order_acquire)) locked_.wait(true, std::memory_order_relaxed);
+  while (locked_.flag.test_and_set(std::memory_order_acquire)) locked_.flag.wait(true, std::memory_order_relaxed);
 }
 
 void TWReportingSessionMessage::unlock() const {
-  locked_.clear(std::memory_order_release);
-  locked_.notify_one();
+  locked_.flag.clear(std::memory_order_release);
+  locked_.flag.notify_one();
 }
 
 }  // namespace tonewerk

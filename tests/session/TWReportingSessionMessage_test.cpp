@@ -55,6 +55,18 @@ TEST_F(TWReportingSessionMessageTest, ACopyIsIndependentAndHasNoDestinations) {
   EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kDebug), ElementsAre("copyWithZone"));
 }
 
+TEST_F(TWReportingSessionMessageTest, AListOfWorkerClassesIsCopiedWithItsClasses) {
+  const WorkerClassList none;
+  EXPECT_THAT(none, IsEmpty());
+  EXPECT_EQ(none.begin(), none.end());
+  WorkerClassList list{&TWReportingSessionMetriconWorker::kWorkerClass, nullptr};
+  const WorkerClassList copy = list;
+  list = none;
+  EXPECT_THAT(list, IsEmpty());
+  EXPECT_EQ(copy.size(), 2U);
+  EXPECT_THAT(copy, ElementsAre(&TWReportingSessionMetriconWorker::kWorkerClass, nullptr));
+}
+
 TEST_F(TWReportingSessionMessageTest, DescribesItselfByCategoryTypeAndPayload) {
   EXPECT_EQ(TWReportingSessionMessage({{"a", 1}}, 4, 1).description(),
             R"(category=Playback type=Start {"a":1})");
