@@ -119,6 +119,15 @@ class Core {
     return session;
   }
 
+  // Records with the payloads of a full session.
+  TWReportingSessionMessages makeFullRecords() {
+    const auto session = makeFullSession(kTest, 0);
+    TWReportingSessionMessages records;
+    records.reserve(session->messages().size());
+    for (const auto* message : session->messages()) records.push_back(message->copyWithZone());
+    return records;
+  }
+
   std::size_t filesWritten() const {
     const std::string path = directory_.path("Audio/Reporting");
     std::error_code error;
@@ -215,7 +224,7 @@ BENCHMARK(StopWithCallRecords)->TONEWERK_CHANGES;
 
 void SortInOrder(benchmark::State& state) {
   Core core;
-  TWReportingSessionMessages messages = core.makeFullSession(kTest, 0)->messages();
+  TWReportingSessionMessages messages = core.makeFullRecords();
   for (auto _ : state) TWReportingSessionMessage::sortMessages(messages);
   reportTimeOfAMessage(state);
 }
@@ -224,7 +233,7 @@ BENCHMARK(SortInOrder)->Unit(benchmark::kMillisecond);
 // One message in ten comes as late as twenty others.
 void SortLate(benchmark::State& state) {
   Core core;
-  TWReportingSessionMessages late = core.makeFullSession(kTest, 0)->messages();
+  TWReportingSessionMessages late = core.makeFullRecords();
   for (std::size_t at = 0; at + 20 < late.size(); at += 10) std::swap(late[at], late[at + 20]);
   for (auto _ : state) {
     state.PauseTiming();
@@ -243,9 +252,8 @@ template <typename Walk>
 void walk(benchmark::State& state, Walk summariesOf) {
   Core core(false);
   const auto session = core.makeFullSession(kTest, static_cast<std::size_t>(state.range(0)));
-  const TWReportingSessionMessages messages = session->messages();
   for (auto _ : state) {
-    TWReportingSessionMessages summaries = summariesOf(session, messages);
+    TWReportingSessionMessages summaries = summariesOf(session, session->messages());
     benchmark::DoNotOptimize(summaries.data());
   }
   reportTimeOfAMessage(state);
@@ -277,7 +285,7 @@ BENCHMARK(GatherWalk)->TONEWERK_CHANGES;
 // The file alone, with the kernel's work for it.
 void WriteFile(benchmark::State& state) {
   Core core;
-  const TWReportingSessionMessages messages = core.makeFullSession(kTest, 0)->messages();
+  const TWReportingSessionMessages messages = core.makeFullRecords();
   for (auto _ : state) {
     SummaryJsonFile file(core.directory(), "stop.json");
     for (const auto& message : messages)
@@ -293,7 +301,7 @@ BENCHMARK(WriteFile)->Unit(benchmark::kMillisecond);
 
 void CallRecordsSummary(benchmark::State& state) {
   Core core;
-  const TWReportingSessionMessages messages = core.makeFullSession(kTest, 0)->messages();
+  const TWReportingSessionMessages messages = core.makeFullRecords();
   for (auto _ : state) {
     const ValueMap summary =
         rtcSummaryOf(messages, kLongFormAudio, TWReportingSessionRtcWorker::kWorkerClass);
@@ -307,9 +315,8 @@ void FreeMessages(benchmark::State& state) {
   Core core(false);
   for (auto _ : state) {
     state.PauseTiming();
-    const auto session = core.makeFullSession(kTest, 0);
-    TWReportingSessionMessages messages = session->messages();
-    session->stop();
+    KeptMessages messages;
+    for (const auto& record : core.makeFullRecords()) messages.add(*record);
     state.ResumeTiming();
     messages.clear();
   }

@@ -20,9 +20,8 @@ namespace {
 
 constexpr double kOldestTimestampSeconds = 31'536'000.0;  // 365 days
 
-// The bytes that a stored message takes in addition to its payload: the record and its entries in messages_
-// and newest_.
-constexpr std::size_t kRecordBytes = sizeof(TWReportingSessionMessage) + 64;
+// An upper bound of the bytes that the index of newest messages takes for a category and type.
+constexpr std::size_t kKindBytes = 96;
 
 const Value kUnknownName("Unknown");
 const Value kNilText("nil");
@@ -148,8 +147,8 @@ bool TWReportingSession::updateConfigurationWithContentsOfConfiguration(const Va
 
 void TWReportingSession::start() {
   assert(TWReportingUtilityIsOnReportingServerQueue());
-  (void)store(lifecycleMessage(kTypeStart,
-                               LifecycleTexts::kStart));  // a start counts also when its message is not kept
+  store(*lifecycleMessage(kTypeStart,
+                          LifecycleTexts::kStart));  // a start counts also when its message is not kept
   infoLog(TWReportingSessionCategory(), "start called. reporterID=%lli", reporterID_);
   if (started_) {
     infoLog(TWReportingSessionCategory(), "%lli is already started", reporterID_);
@@ -265,8 +264,15 @@ void TWReportingSession::sendMessage(const std::shared_ptr<TWReportingSessionMes
            "TWReportingSessionWorker action=sendMessage reporterID=%lli app=%@ redundant=%@ message=%@",
            reporterID_, applicationName_, yesOrNo(message->isRedundant), *message);
   addPreviousValues(message->message);
-  if (!message->isRedundant && !store(message)) ++unkeptMessageCount_;
-  deliver(*message);
+  const TWReportingSessionMessage* stored = message->isRedundant ? nullptr : store(*message);
+  if (!message->isRedundant && stored == nullptr) ++unkeptMessageCount_;
+  // A worker that keeps the payload shares that of the stored message, which takes memory anyway. A copy,
+  // because a worker may stop the session.
+  if (stored == nullptr) {
+    deliver(*message);
+  } else {
+    deliver(TWReportingSessionMessage(*stored));
+  }
   if (reply) reply(std::nullopt);
 }
 
@@ -287,15 +293,14 @@ void TWReportingSession::deliver(const TWReportingSessionMessage& message) {
 
 void TWReportingSession::stop() {
   assert(TWReportingUtilityIsOnReportingServerQueue());
-  (void)store(lifecycleMessage(kTypeStop,
-                               LifecycleTexts::kStop));  // a stop counts even when its message is not stored
+  store(*lifecycleMessage(kTypeStop,
+                          LifecycleTexts::kStop));  // a stop counts even when its message is not stored
   debugLog(TWReportingSessionCategory(), "stop called. reporterID=%lli", reporterID_);
   if (!started_) return logUnkeptCount();
   debugLog(TWReportingSessionCategory(), "ending session. reporterID=%lli", reporterID_);
   emitTracePoint(TWReportingTracePoint::kSessionEnding);
-  TWReportingSessionMessage::sortMessages(messages_);
-  newest_.clear();
-  for (const auto& message : messages_) rememberAsNewest(*message);
+  messages_.sortByTime();
+  for (const auto* message : messages_) newest_[{message->category, message->type}] = message;
 
   for (TWReportingSessionWorkerProtocol* worker : workersInOrder(Order::kProducersFirst)) {
     if (!worker->started) continue;
@@ -329,20 +334,17 @@ std::shared_ptr<TWReportingSessionMessage> TWReportingSession::lifecycleMessage(
   return message;
 }
 
-bool TWReportingSession::store(const std::shared_ptr<TWReportingSessionMessage>& message) {
-  const std::size_t bytes = kRecordBytes + message->message.bytes();
+const TWReportingSessionMessage* TWReportingSession::store(const TWReportingSessionMessage& message) {
+  const auto [newest, isNewKind] = newest_.try_emplace({message.category, message.type});
+  const std::size_t bytes = KeptMessages::bytesOf(message) + (isNewKind ? kKindBytes : 0);
   if (!budget_->take(bytes)) {
+    if (isNewKind) newest_.erase(newest);
     logFullBudgetOnce();
-    return false;
+    return nullptr;
   }
   messageBytes_ += bytes;
-  messages_.push_back(message);
-  rememberAsNewest(*message);
-  return true;
-}
-
-void TWReportingSession::rememberAsNewest(const TWReportingSessionMessage& message) {
-  newest_[{message.category, message.type}] = &message;
+  newest->second = &messages_.add(message);
+  return newest->second;
 }
 
 void TWReportingSession::logFullBudgetOnce() {
@@ -368,7 +370,6 @@ void TWReportingSession::logUnkeptCount() {
 void TWReportingSession::forgetMessages() {
   newest_.clear();
   messages_.clear();
-  messages_.shrink_to_fit();
   budget_->give(messageBytes_);
   messageBytes_ = 0;
 }

@@ -14,6 +14,7 @@
 #include "protocol/AudioEvent.h"
 #include "protocol/RequestSet.h"
 #include "session/KeptBytesBudget.h"
+#include "session/KeptMessages.h"
 #include "session/PreviousValues.h"
 #include "session/TWReportingSessionMessage.h"
 #include "session/TWReportingSessionWorkerClass.h"
@@ -73,8 +74,8 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   void logUnkeptMessages();
 
   using MessageReply = std::function<void(const std::optional<ReplyError>& error)>;
-  // Normalises the message, decides whether it is redundant, stores and delivers it, then replies without
-  // an error. The record then belongs to the session.
+  // Normalises the message, decides whether it is redundant, stores a copy and delivers it, then replies
+  // without an error.
   void sendMessage(const std::shared_ptr<TWReportingSessionMessage>& message,
                    const MessageReply& reply = nullptr);
 
@@ -113,7 +114,7 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   // Null when the session has none.
   ShapeTable* shapes() const { return shapes_.get(); }
   // The stored messages, without redundant ones, in order of arrival; sorted by time while the session stops.
-  const TWReportingSessionMessages& messages() const { return messages_; }
+  const KeptMessages& messages() const { return messages_; }
   // How many messages were received since the session was made or last stopped, and how many were redundant.
   std::uint64_t totalMessageCount() const { return totalMessageCount_; }
   std::uint64_t redundantMessageCount() const { return redundantMessageCount_; }
@@ -166,9 +167,8 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   void deliver(const TWReportingSessionMessage& message);
   // The bytes that the session has taken from the budget.
   std::size_t keptBytes() const;
-  // Returns false when the budget has no room for the message.
-  [[nodiscard]] bool store(const std::shared_ptr<TWReportingSessionMessage>& message);
-  void rememberAsNewest(const TWReportingSessionMessage& message);
+  // Returns the stored message; null when the budget has no room for it.
+  const TWReportingSessionMessage* store(const TWReportingSessionMessage& message);
   void logFullBudgetOnce();
   void logUnkeptCount();
   void forgetMessages();
@@ -185,10 +185,11 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   std::uint64_t redundantMessageCount_ = 0;
   std::optional<std::chrono::nanoseconds> startedAt_;
 
-  TWReportingSessionMessages messages_;
+  KeptMessages messages_;
   // The newest stored message of each category and type. An ordered map, because clients choose the keys
   // and could choose ones that collide in a hash table.
-  std::map<std::pair<AudioEventCategory, AudioEventType>, const TWReportingSessionMessage*> newest_;
+  using Kind = std::pair<AudioEventCategory, AudioEventType>;
+  std::map<Kind, const TWReportingSessionMessage*> newest_;
   std::size_t messageBytes_ = 0;          // taken from the budget for messages_
   std::uint64_t unkeptMessageCount_ = 0;  // delivered but not stored for lack of room, and not logged yet
   std::vector<Consumer> consumers_;       // in the order of consumingMessageWorkers(); workers_ owns them

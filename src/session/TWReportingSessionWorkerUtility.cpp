@@ -8,8 +8,7 @@
 namespace tonewerk {
 
 std::vector<std::size_t> TWReportingSessionWorkerUtility::mergeRapidMessages(
-    const TWReportingSessionMessages& messages, std::span<const std::string_view> keysToCombine,
-    double maximumPausetime) {
+    MessageRange messages, std::span<const std::string_view> keysToCombine, double maximumPausetime) {
   std::vector<std::size_t> merged;
   std::vector<std::string_view> seen;
   TWReportingSessionMessage* anchor = nullptr;

@@ -6,6 +6,7 @@
 #include <string_view>
 #include <vector>
 
+#include "session/MessageRange.h"
 #include "session/TWReportingSessionMessage.h"
 
 namespace tonewerk {
@@ -17,7 +18,7 @@ class TWReportingSessionWorkerUtility {
   // payload is changed in place. Returns the places of the messages that were merged, in order. A burst ends
   // when one of its keys comes again. A message that comes `maximumPausetime` seconds or more after the
   // last merged one is not merged, but does not end the burst.
-  static std::vector<std::size_t> mergeRapidMessages(const TWReportingSessionMessages& messages,
+  static std::vector<std::size_t> mergeRapidMessages(MessageRange messages,
                                                      std::span<const std::string_view> keysToCombine,
                                                      double maximumPausetime);
 

@@ -409,8 +409,8 @@ TEST_F(RequestTest, AMessageReachesEachNamedSessionWithARecordOfItsOwn) {
   create(*client, 78);
   send({{"a", 1}}, Value(ValueArray{77, 78, 5, 0}));
   EXPECT_THAT(delivered(), ElementsAre("a=1", "a=1"));
-  const auto& first = sessionOf(0, 77)->messages().at(0);
-  const auto& second = sessionOf(0, 78)->messages().at(0);
+  auto* first = sessionOf(0, 77)->messages().front();
+  auto* second = sessionOf(0, 78)->messages().front();
   EXPECT_NE(first, second);
   EXPECT_EQ(first->category, 4U);
   EXPECT_EQ(first->type, 1);

@@ -316,6 +316,14 @@ TEST_F(TWReportingSessionTest, AMessageKnowsWhetherItsSessionWasStarted) {
   EXPECT_TRUE(session->messages().back()->isSessionStarted);
 }
 
+TEST_F(TWReportingSessionTest, AStoredMessageIsACopy) {
+  const auto session = makeSession();
+  const auto record = message({{"a", 1}});
+  session->sendMessage(record);
+  record->message.set("a", 2);
+  EXPECT_EQ(session->messages().back()->message.integer("a"), 1);
+}
+
 TEST_F(TWReportingSessionTest, PreviousValuesAreTheLatestOfEveryKey) {
   const auto session = makeSession();
   session->sendMessage(message({{"a", 1}, {"b", 1}}));
@@ -819,6 +827,21 @@ TEST_F(BudgetTest, AnUnkeptMessageIsCountedOnce) {
   for (int n = 0; n < 11; ++n) session->sendMessage(message({{"a", n}, {"text", std::string(3'000, 'x')}}));
   session->stop();
   EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kError), Contains(unkept(11)));
+}
+
+TEST_F(BudgetTest, AMessageOfANewKindTakesMoreForTheIndexOfTheNewest) {
+  const auto session = makeSessionWithin(100'000);
+  const auto bytesOf = [&](const ValueMap& payload, AudioEventType type) {
+    const std::size_t before = budget->used();
+    session->sendMessage(message(payload, 4, type));
+    return budget->used() - before;
+  };
+  (void)bytesOf({{"a", 1}}, kTypeStart);
+  const std::size_t known = bytesOf({{"a", 2}}, kTypeStart);
+  EXPECT_GT(bytesOf({{"a", 3}}, kTypeSetup), known + 64);
+  session->start();
+  session->stop();
+  EXPECT_EQ(budget->used(), session->previousValues().bytes());
 }
 
 TEST_F(BudgetTest, ARedundantMessageIsNotCountedAsUnkept) {

@@ -9,6 +9,7 @@
 #include <utility>
 #include <vector>
 
+#include "session/MessageRange.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionMessage.h"
@@ -52,10 +53,10 @@ class ReportingTest : public ::testing::Test {
   std::optional<TWReportingContext> context;
 };
 
-// Returns the texts that `records` hold under `key`, in order.
-inline std::vector<std::string> textsUnder(std::string_view key, const TWReportingSessionMessages& records) {
+// Returns the texts that `messages` hold under `key`, in order.
+inline std::vector<std::string> textsUnder(std::string_view key, MessageRange messages) {
   std::vector<std::string> texts;
-  for (const auto& record : records) texts.push_back(textOf(record->message.find(key)));
+  for (const auto* message : messages) texts.push_back(textOf(message->message.find(key)));
   return texts;
 }
 

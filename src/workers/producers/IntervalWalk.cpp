@@ -100,7 +100,7 @@ IntervalWalk::IntervalWalk(const Kind& kind, const LogSite& site, double minimum
   }
 }
 
-TWReportingSessionMessages IntervalWalk::summariesOf(const TWReportingSessionMessages& messages,
+TWReportingSessionMessages IntervalWalk::summariesOf(MessageRange messages,
                                                      std::span<const std::size_t> leftOut) {
   walked_.reserve(messages.size() - leftOut.size());
   auto nextLeftOut = leftOut.begin();

@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "platform/Log.h"
+#include "session/MessageRange.h"
 #include "session/TWReportingSessionMessage.h"
 #include "values/Value.h"
 #include "values/ValueView.h"
@@ -68,8 +69,7 @@ class IntervalWalk {
 
   // The summaries of `messages` without those at the places `leftOut`, which ascend. In order; each says how
   // many there are. Nobody may change the messages meanwhile.
-  TWReportingSessionMessages summariesOf(const TWReportingSessionMessages& messages,
-                                         std::span<const std::size_t> leftOut = {});
+  TWReportingSessionMessages summariesOf(MessageRange messages, std::span<const std::size_t> leftOut = {});
 
  protected:
   // The latest value of one key before the message that is being looked at. It is searched only when it is

@@ -77,7 +77,7 @@ void TWReportingSessionGatherMessagesWorker::stop() {
 }
 
 TWReportingSessionMessages TWReportingSessionGatherMessagesWorker::createGatherMessages(
-    const TWReportingSessionMessages& messages, double minimumPlaytime) const {
+    MessageRange messages, double minimumPlaytime) const {
   debugLog(TWReportingSessionCategory(), "entering createGatherMessages %s", "createGatherMessages");
   const auto owner = session.lock();
   GatherWalk walk(TWReportingSessionCategory(), owner == nullptr ? ValueMap() : owner->previousValues(),

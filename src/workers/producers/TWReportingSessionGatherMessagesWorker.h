@@ -3,6 +3,7 @@
 
 #include <memory>
 
+#include "session/MessageRange.h"
 #include "session/TWReportingSessionMessage.h"
 #include "session/TWReportingSessionWorkerClass.h"
 
@@ -36,8 +37,7 @@ class TWReportingSessionGatherMessagesWorker final : public TWReportingSessionWo
 
   // The summaries of `messages`, in order. Intervals of `minimumPlaytime` seconds or less are left out. The
   // messages are not changed.
-  TWReportingSessionMessages createGatherMessages(const TWReportingSessionMessages& messages,
-                                                  double minimumPlaytime) const;
+  TWReportingSessionMessages createGatherMessages(MessageRange messages, double minimumPlaytime) const;
 };
 
 }  // namespace tonewerk

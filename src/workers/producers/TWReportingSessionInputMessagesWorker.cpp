@@ -104,8 +104,7 @@ void TWReportingSessionInputMessagesWorker::stop() {
 }
 
 TWReportingSessionMessages TWReportingSessionInputMessagesWorker::createInputMessages(
-    const TWReportingSessionMessages& messages, const SharedString* process,
-    double minimumRunningtime) const {
+    MessageRange messages, const SharedString* process, double minimumRunningtime) const {
   debugLog(TWReportingSessionCategory(), "entering createInputMessages %s", "createInputMessages");
   const auto owner = session.lock();
   InputWalk walk(TWReportingSessionCategory(), owner == nullptr ? ValueMap() : owner->previousValues(),

@@ -3,6 +3,7 @@
 
 #include <memory>
 
+#include "session/MessageRange.h"
 #include "session/TWReportingSessionMessage.h"
 #include "session/TWReportingSessionWorkerClass.h"
 
@@ -35,8 +36,7 @@ class TWReportingSessionInputMessagesWorker final : public TWReportingSessionWor
   // The summaries of `messages`, in order, for the application `process`; null gives no summaries. Intervals
   // of `minimumRunningtime` seconds or less are left out, and their vocoders are listed in the next summary.
   // Merges messages that follow one another rapidly, in place.
-  TWReportingSessionMessages createInputMessages(const TWReportingSessionMessages& messages,
-                                                 const SharedString* process,
+  TWReportingSessionMessages createInputMessages(MessageRange messages, const SharedString* process,
                                                  double minimumRunningtime) const;
 };
 

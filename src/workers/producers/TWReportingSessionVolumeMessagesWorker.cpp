@@ -91,7 +91,7 @@ void TWReportingSessionVolumeMessagesWorker::stop() {
 }
 
 TWReportingSessionMessages TWReportingSessionVolumeMessagesWorker::createVolumeMessages(
-    const TWReportingSessionMessages& messages, const SharedString* process, double minimumPlaytime) const {
+    MessageRange messages, const SharedString* process, double minimumPlaytime) const {
   debugLog(TWReportingSessionCategory(), "entering createVolumeMessages %s", "createVolumeMessages");
   const auto owner = session.lock();
   VolumeWalk walk(TWReportingSessionCategory(), owner == nullptr ? ValueMap() : owner->previousValues(),

@@ -3,6 +3,7 @@
 
 #include <memory>
 
+#include "session/MessageRange.h"
 #include "session/TWReportingSessionMessage.h"
 #include "session/TWReportingSessionWorkerClass.h"
 
@@ -34,8 +35,8 @@ class TWReportingSessionVolumeMessagesWorker final : public TWReportingSessionWo
   // The summaries of `messages`, in order, for the application `process`; null gives no summaries. Intervals
   // of `minimumPlaytime` seconds or less are left out. Merges messages that follow one another rapidly, in
   // place.
-  TWReportingSessionMessages createVolumeMessages(const TWReportingSessionMessages& messages,
-                                                  const SharedString* process, double minimumPlaytime) const;
+  TWReportingSessionMessages createVolumeMessages(MessageRange messages, const SharedString* process,
+                                                  double minimumPlaytime) const;
 };
 
 }  // namespace tonewerk

@@ -3,6 +3,7 @@
 
 #include <cmath>
 #include <gtest/gtest.h>
+#include <map>
 #include <nlohmann/json.hpp>
 
 #include "support/ReportingTest.h"
@@ -121,15 +122,33 @@ TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, TwoCategoriesOfOneTextShareA
               ElementsAre("Setup_Start_1", "Setup_Stop_1", "_Generic_Generic_1", "_Generic_Generic_2"));
 }
 
+// Stops after the file's worker, and sees the stored messages as that left them.
+class LaterWorker final : public TWReportingSessionWorkerProtocol {
+ public:
+  static const TWReportingSessionWorkerClass kWorkerClass;
+  const TWReportingSessionWorkerClass& workerClass() const override { return kWorkerClass; }
+  explicit LaterWorker(const std::shared_ptr<TWReportingSession>& owner) { session = owner; }
+  void stop() override {
+    for (const auto& stored : session.lock()->messages()) {
+      seen[stored->message.text("a")] = stored->message.text("isSessionStarted");
+    }
+  }
+
+  std::map<std::string, std::string> seen;  // by what the message says under "a"
+};
+const TWReportingSessionWorkerClass LaterWorker::kWorkerClass = workerClassOf<LaterWorker>("LaterWorker");
+
 TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, EachPayloadSaysWhetherItsSessionWasStarted) {
-  const auto before = message({{"a", "before"}});
-  session->sendMessage(before);
+  useWorkers({&TWReportingSessionSummaryJsonFileWorker::kWorkerClass, &LaterWorker::kWorkerClass});
+  session = makeSession(77);
+  session->setServiceType(11);
+  session->sendMessage(message({{"a", "before"}}));
   session->start();
-  const auto after = message({{"a", "after"}});
-  session->sendMessage(after);
+  session->sendMessage(message({{"a", "after"}}));
+  const auto later = std::dynamic_pointer_cast<LaterWorker>(session->messageWorkers().back());
   stop();
-  EXPECT_EQ(before->message.text("isSessionStarted"), "NO");  // in the stored messages themselves
-  EXPECT_EQ(after->message.text("isSessionStarted"), "YES");
+  EXPECT_EQ(later->seen["before"], "NO");  // in the stored messages themselves
+  EXPECT_EQ(later->seen["after"], "YES");
   EXPECT_THAT(test.files.contents(kPath).value(), HasSubstr("\"isSessionStarted\": \"YES\""));
 }
 

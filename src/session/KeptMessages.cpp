@@ -1,0 +1,30 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "session/KeptMessages.h"
+
+#include <utility>
+#include <vector>
+
+#include "session/MessageRange.h"
+
+namespace tonewerk {
+
+TWReportingSessionMessage& KeptMessages::add(const TWReportingSessionMessage& message) {
+  TWReportingSessionMessage& added = messages_.add(message);
+  if (size() > kFewMessages) added.message = payloads_.keep(message.message);
+  return added;
+}
+
+void KeptMessages::sortByTime() {
+  const std::vector<std::size_t> places = placesByTime(*this);
+  if (places.empty()) return;
+  PieceVector<TWReportingSessionMessage> sorted;
+  for (const std::size_t place : places) sorted.add(std::move(messages_[place]));
+  messages_ = std::move(sorted);
+}
+
+void KeptMessages::clear() {
+  messages_.clear();
+  payloads_.clear();
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,55 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstddef>
+#include <iterator>
+
+#include "session/KeptPayloads.h"
+#include "session/TWReportingSessionMessage.h"
+#include "values/IndexIterator.h"
+#include "values/PieceVector.h"
+
+namespace tonewerk {
+
+// The messages that a session keeps, in little more memory than their values take.
+//
+// An element is a pointer to a message, which stays valid until sortByTime() or clear(). The messages may be
+// changed through it. Payloads that others share live on after clear(). One thread.
+class KeptMessages {
+ public:
+  // So many payloads are shared with the message that was added, not copied to memory of their own: few
+  // messages would take less memory than a chunk.
+  static constexpr std::size_t kFewMessages = 64;
+
+  // Adds a copy of the message.
+  TWReportingSessionMessage& add(const TWReportingSessionMessage& message);
+  // Sorts by epochTime(), ascending and stable. A time that is not a number counts as 0.
+  void sortByTime();
+  // Frees all memory that nobody else holds.
+  void clear();
+
+  // Returns an upper bound of the bytes that add() takes for the message.
+  static std::size_t bytesOf(const TWReportingSessionMessage& message) {
+    return sizeof(TWReportingSessionMessage) + KeptPayloads::bytesOf(message.message);
+  }
+
+  std::size_t size() const { return messages_.size(); }
+  bool empty() const { return size() == 0; }
+  TWReportingSessionMessage* operator[](std::size_t place) const { return &messages_[place]; }
+  TWReportingSessionMessage* front() const { return (*this)[0]; }
+  TWReportingSessionMessage* back() const { return (*this)[size() - 1]; }
+
+  using Iterator = IndexIterator<KeptMessages>;
+  using const_iterator = Iterator;
+  using value_type = TWReportingSessionMessage*;
+  Iterator begin() const { return {*this, 0}; }
+  Iterator end() const { return {*this, size()}; }
+  std::reverse_iterator<Iterator> rbegin() const { return std::reverse_iterator(end()); }
+  std::reverse_iterator<Iterator> rend() const { return std::reverse_iterator(begin()); }
+
+ private:
+  KeptPayloads payloads_;
+  PieceVector<TWReportingSessionMessage> messages_;
+};
+
+}  // namespace tonewerk
