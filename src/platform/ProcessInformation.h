@@ -19,8 +19,8 @@ class ProcessInformation {
   // Returns the identifier of this process.
   virtual std::int32_t ownProcessIdentifier() const = 0;
 
-  // Returns the memory that only this process uses, in bytes: resident and swapped anonymous memory. On
-  // failure returns the operating system's error text.
+  // Returns the memory that only this process uses, in bytes: resident and swapped anonymous memory. It
+  // may be 10 ms old. On failure returns the operating system's error text.
   [[nodiscard]] virtual std::variant<std::uint64_t, std::string> physicalFootprint() const = 0;
 
   // Returns the processor time of this process so far, in microseconds (the ticks of the C library's

@@ -15,7 +15,7 @@ class SystemInformation {
 
   virtual bool isLowPowerModeEnabled() const = 0;
 
-  // Returns the load over 1, 5 and 15 minutes; zeros when it cannot be read.
+  // Returns the load over 1, 5 and 15 minutes, which may be a second old; zeros when it cannot be read.
   virtual std::array<double, 3> loadAverages() const = 0;
 
   // Returns the seconds since the device started, including sleep.

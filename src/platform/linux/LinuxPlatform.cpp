@@ -73,7 +73,7 @@ struct LinuxPlatform::Adapters {
   ThreadQueueFactory queues;
   TimerThread timers;
   ThreadSemaphores semaphores;
-  LinuxProcessInformation processes;
+  LinuxProcessInformation processes{clock};
   LinuxSystemInformation system{clock};
   TomlDeviceFacts deviceFacts;
   TomlPreferenceStore preferences;

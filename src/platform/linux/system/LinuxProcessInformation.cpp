@@ -56,6 +56,17 @@ std::optional<std::string> LinuxProcessInformation::processName(std::int32_t pro
 std::int32_t LinuxProcessInformation::ownProcessIdentifier() const { return getpid(); }
 
 std::variant<std::uint64_t, std::string> LinuxProcessInformation::physicalFootprint() const {
+  if (clock_ == nullptr) return readFootprint();
+  const std::chrono::nanoseconds now = clock_->monotonic();
+  const MutexLock lock(mutex_);
+  if (footprint_ && now - footprint_->at <= kMaxFootprintAge) return footprint_->bytes;
+  footprint_.reset();
+  const auto read = readFootprint();
+  if (const auto* bytes = std::get_if<std::uint64_t>(&read)) footprint_ = Footprint{now, *bytes};
+  return read;
+}
+
+std::variant<std::uint64_t, std::string> LinuxProcessInformation::readFootprint() const {
   std::string status;
   if (const std::error_code error = readThroughSwapLine(statusPath_, status)) return error.message();
   const std::size_t wanted = status.find("\nRssAnon:");  // the line of the swapped memory comes later

@@ -20,6 +20,12 @@ bool isLowProfile(const std::string& acpiDirectory) {
   return choices.find("low-power") == std::string::npos;
 }
 
+std::array<double, 3> readLoadAverages() {
+  std::array<double, 3> averages{};
+  if (getloadavg(averages.data(), 3) != 3) return {};
+  return averages;
+}
+
 }  // namespace
 
 LinuxSystemInformation::LinuxSystemInformation(const Clock& clock, std::string sysDirectory,
@@ -39,16 +45,12 @@ LinuxSystemInformation::Reading LinuxSystemInformation::reading() const {
   const MutexLock lock(mutex_);
   if (!reading_ || now - reading_->at > kMaxAge) {
     reading_ = Reading{now, thermalLevelOf(sysDirectory_ + "/class/thermal"),
-                       isLowProfile(sysDirectory_ + "/firmware/acpi")};
+                       isLowProfile(sysDirectory_ + "/firmware/acpi"), readLoadAverages()};
   }
   return *reading_;
 }
 
-std::array<double, 3> LinuxSystemInformation::loadAverages() const {
-  std::array<double, 3> averages{};
-  if (getloadavg(averages.data(), 3) != 3) return {};
-  return averages;
-}
+std::array<double, 3> LinuxSystemInformation::loadAverages() const { return reading().loadAverages; }
 
 double LinuxSystemInformation::uptimeSeconds() const {
   timespec time{};

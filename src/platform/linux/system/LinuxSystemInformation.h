@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <array>
 #include <atomic>
 #include <chrono>
 #include <optional>
@@ -16,11 +17,12 @@ namespace tonewerk {
 // Reads the device's state from /sys, /proc and the power-profiles service.
 //
 // No call waits for another process: PowerProfileWatcher follows the power profile on its own thread, and
-// power-saver mode counts as off until the first answer. /sys is read at most once a second. Any thread.
+// power-saver mode counts as off until the first answer. /sys and the load are read at most once a second.
+// Any thread.
 class LinuxSystemInformation final : public SystemInformation {
  public:
-  // The maximum age of values from /sys. Many sessions often stop at the same time, and reading a sensor can
-  // take milliseconds.
+  // The maximum age of values from /sys and of the load averages. Many sessions often stop at the same time,
+  // and reading a sensor can take milliseconds. The kernel computes new load averages every five seconds.
   static constexpr std::chrono::seconds kMaxAge{1};
 
   // `clock` must outlive this object. Tests pass another `sysDirectory` and `busAddress`; an empty address
@@ -43,6 +45,7 @@ class LinuxSystemInformation final : public SystemInformation {
     std::chrono::nanoseconds at{0};
     int thermalLevel = 0;
     bool isPlatformProfileLow = false;
+    std::array<double, 3> loadAverages{};
   };
   Reading reading() const;
 

@@ -9,6 +9,7 @@
 #include <unistd.h>
 
 #include "support/TemporaryDirectory.h"
+#include "support/manual/ManualClock.h"
 
 namespace tonewerk {
 namespace {
@@ -19,7 +20,8 @@ class MadeProc {
     std::filesystem::create_directories(std::filesystem::path(directory_.path(name)).parent_path());
     std::ofstream(directory_.path(name)) << text;
   }
-  LinuxProcessInformation information() const { return LinuxProcessInformation(directory_.path()); }
+  std::string path() const { return directory_.path(); }
+  LinuxProcessInformation information() const { return LinuxProcessInformation(path()); }
 
  private:
   TemporaryDirectory directory_;
@@ -91,6 +93,28 @@ TEST(LinuxProcessInformationTest, TheFootprintGrowsWithTheMemoryInUse) {
   const auto after = std::get<std::uint64_t>(processes.physicalFootprint());
   munmap(memory, kBytes);
   EXPECT_GE(after, before + kBytes / 2);
+}
+
+TEST(LinuxProcessInformationTest, WithAClockAFootprintIsReadOnceInTenMilliseconds) {
+  ManualClock clock;
+  MadeProc proc;
+  const LinuxProcessInformation processes(clock, proc.path());
+  proc.write("self/status", "RssAnon:\t 8 kB\nVmSwap:\t 0 kB\n");
+  EXPECT_EQ(std::get<std::uint64_t>(processes.physicalFootprint()), 8U * 1024U);
+  proc.write("self/status", "RssAnon:\t 9 kB\nVmSwap:\t 0 kB\n");
+  clock.advance(LinuxProcessInformation::kMaxFootprintAge);
+  EXPECT_EQ(std::get<std::uint64_t>(processes.physicalFootprint()), 8U * 1024U);
+  clock.advance(std::chrono::nanoseconds(1));
+  EXPECT_EQ(std::get<std::uint64_t>(processes.physicalFootprint()), 9U * 1024U);
+}
+
+TEST(LinuxProcessInformationTest, AFootprintThatCannotBeReadIsReadAgainAtOnce) {
+  ManualClock clock;
+  MadeProc proc;
+  const LinuxProcessInformation processes(clock, proc.path());
+  EXPECT_EQ(std::get<std::string>(processes.physicalFootprint()), "No such file or directory");
+  proc.write("self/status", "RssAnon:\t 8 kB\nVmSwap:\t 0 kB\n");
+  EXPECT_EQ(std::get<std::uint64_t>(processes.physicalFootprint()), 8U * 1024U);
 }
 
 TEST(LinuxProcessInformationTest, ProcessorTimeGrowsWithWork) {
