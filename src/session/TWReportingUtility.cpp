@@ -16,6 +16,9 @@
 namespace tonewerk {
 namespace {
 
+// Made once, because every session asks for it several times.
+const SharedString kUnknownName("Unknown");
+
 // Writes `maxDigits` fraction digits and removes trailing zeros, but leaves at least `minDigits` of them.
 std::string decimalText(double value, int maxDigits, int minDigits) {
   char digits[400];
@@ -90,7 +93,7 @@ bool TWReportingUtilityKeyIsPresentAndHasChanged(std::string_view key, const Val
 
 SharedString TWReportingUtilityRetrieveAppName(const ValueMap& configuration) {
   const ValueView name = configuration.view(TWReportingApplicationName);
-  if (!name) return "Unknown";
+  if (!name) return kUnknownName;
   const Value* held = name.held();
   if (held != nullptr && held->asString() != nullptr) return *held->asString();
   return name.text();

@@ -21,9 +21,30 @@ namespace {
 constexpr AudioEventCategory kCategorySessionSummary = kDomainSession | kCategoryGeneric;
 const Value kOverload("overload");
 
-std::string_view thermalStateText(int level) {
-  constexpr std::array<std::string_view, 4> kTexts{"Nominal", "Fair", "Serious", "Critical"};
-  return level >= 0 && level < 4 ? kTexts[static_cast<std::size_t>(level)] : "Unknown";
+// The keys and texts of summaries are made once, because making them takes longer than the rest of a summary.
+const SharedString kTotalActiveTime("total_active_time");
+const SharedString kActiveCount("active_count");
+const SharedString kOverloadCount("overload_count");
+const SharedString kAverageActiveTime("average_active_time");
+const SharedString kMessageCount("num_messages");
+const SharedString kUniqueMessageCount("num_unique_messages");
+const SharedString kRedundantMessageCount("num_redundant_messages");
+const SharedString kSingleMessageSession("singleMessageSession");
+const SharedString kServiceName("summaryServiceName");
+const SharedString kClientProcessName("clientProcessName");
+const SharedString kThermalState("thermal_state");
+const SharedString kLowPowerEnabled("low_power_enabled");
+const SharedString kFootprint("vmInfo_phys_footprint_MiB");
+const std::array<SharedString, 3> kLoadAverages{"load_avg_1_min", "load_avg_5_min", "load_avg_15_min"};
+const std::array<SharedString, 4> kThermalStates{"Nominal", "Fair", "Serious", "Critical"};
+const SharedString kUnknown("Unknown");
+
+// The entries of a summary, and those that the session adds to each message.
+constexpr std::size_t kEntries = 20;
+
+const SharedString& thermalStateText(int level) {
+  const auto place = static_cast<std::size_t>(level);
+  return level >= 0 && place < kThermalStates.size() ? kThermalStates[place] : kUnknown;
 }
 
 // Only the low 32 bits of the footprint count, as ever: 4 GiB and more wrap.
@@ -31,18 +52,16 @@ std::uint32_t mebibytes(std::uint64_t bytes) { return static_cast<std::uint32_t>
 
 void addDeviceState(ValueMap& summary) {
   const Platform& platform = TWReportingContext::current().platform();
-  summary.set("thermal_state", thermalStateText(platform.system.thermalLevel()));
-  summary.set("low_power_enabled", platform.system.isLowPowerModeEnabled() ? 1 : 0);
+  summary.add(kThermalState, thermalStateText(platform.system.thermalLevel()));
+  summary.add(kLowPowerEnabled, platform.system.isLowPowerModeEnabled() ? 1 : 0);
   const auto footprint = platform.processes.physicalFootprint();
   if (const auto* bytes = std::get_if<std::uint64_t>(&footprint)) {
-    summary.set("vmInfo_phys_footprint_MiB", mebibytes(*bytes));
+    summary.add(kFootprint, mebibytes(*bytes));
   } else {
     errorLog(TWReportingSummaryLogCategory(), "Error with task_info(): %s", std::get<std::string>(footprint));
   }
   const std::array<double, 3> loads = platform.system.loadAverages();
-  summary.set("load_avg_1_min", loads[0]);
-  summary.set("load_avg_5_min", loads[1]);
-  summary.set("load_avg_15_min", loads[2]);
+  for (std::size_t at = 0; at < loads.size(); ++at) summary.add(kLoadAverages[at], loads[at]);
 }
 
 }  // namespace
@@ -73,20 +92,20 @@ void TWReportingSessionSummaryWorker::stop() {
 ValueMap TWReportingSessionSummaryWorker::summaryOf(const TWReportingSession& owner) const {
   const std::uint64_t received = owner.totalMessageCount();
   const std::uint64_t stored = owner.messages().size();
-  ValueMap summary{
-      {"total_active_time", totalActiveTime_},
-      {"active_count", activeCount_},
-      {"overload_count", overloadCount_},
-      {"average_active_time", activeCount_ == 0 ? 0.0 : totalActiveTime_ / activeCount_},
-      {"num_messages", received},
-      {"num_unique_messages", stored},
-      {"num_redundant_messages",
-       received - stored},  // an approximation: wraps when more are stored than were received
-      {"singleMessageSession", owner.isSingleMessageSession()},
-      {"summaryServiceName", owner.serviceName()},
-      {TWReportingApplicationName, TWReportingUtilityRetrieveAppName(owner.configuration())},
-  };
-  if (const auto name = owner.clientProcessName()) summary.set("clientProcessName", *name);
+  ValueMap summary;
+  summary.reserve(kEntries);
+  summary.add(kTotalActiveTime, totalActiveTime_);
+  summary.add(kActiveCount, activeCount_);
+  summary.add(kOverloadCount, overloadCount_);
+  summary.add(kAverageActiveTime, activeCount_ == 0 ? 0.0 : totalActiveTime_ / activeCount_);
+  summary.add(kMessageCount, received);
+  summary.add(kUniqueMessageCount, stored);
+  // An approximation: wraps when more are stored than were received.
+  summary.add(kRedundantMessageCount, received - stored);
+  summary.add(kSingleMessageSession, owner.isSingleMessageSession());
+  summary.add(kServiceName, owner.serviceName());
+  summary.add(TWReportingApplicationName, TWReportingUtilityRetrieveAppName(owner.configuration()));
+  if (const auto name = owner.clientProcessName()) summary.add(kClientProcessName, *name);
   addDeviceState(summary);
   return summary;
 }
