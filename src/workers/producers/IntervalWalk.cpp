@@ -27,12 +27,17 @@ Value IntervalWalk::Interval::bucketedLength() const {
       .value_or("");
 }
 
-IntervalWalk::Latest::Latest(const IntervalWalk& walk, std::string_view key, std::optional<Value> initial)
-    : walk_(walk), key_(key), initial_(std::move(initial)), value_(walk.previousValues_.view(key)) {
-  if (!value_ && initial_) value_ = ValueView(*initial_);
-}
+const Value IntervalWalk::kUnknownText("unknown");
+const Value IntervalWalk::kFalse(false);
+const Value IntervalWalk::kMinusOne(-1);
 
+// Most walks end no interval and ask for nothing, so that the previous values are not searched either.
 ValueView IntervalWalk::Latest::find() {
+  if (!hasBegun_) {
+    hasBegun_ = true;
+    value_ = walk_.previousValues_.view(key_);
+    if (!value_) value_ = ValueView(initial_);
+  }
   const std::size_t current = walk_.walked_.size() - 1;
   for (std::size_t place = current; place > searched_; --place) {
     const ValueView found = in(place - 1);

@@ -72,13 +72,20 @@ class IntervalWalk {
   TWReportingSessionMessages summariesOf(MessageRange messages, std::span<const std::size_t> leftOut = {});
 
  protected:
+  // Initial values, made once.
+  static const Value kUnknownText;  // "unknown"
+  static const Value kFalse;
+  static const Value kMinusOne;
+
   // The latest value of one key before the message that is being looked at. It is searched only when it is
   // asked for, from there backwards to the last search. So each message is searched at most once, and mostly
   // only the one before.
   class Latest {
    public:
-    // `initial` is the value when neither the messages nor the previous values have the key.
-    Latest(const IntervalWalk& walk, std::string_view key, std::optional<Value> initial = std::nullopt);
+    // `initial` is the value when neither the messages nor the previous values have the key. It outlives the
+    // walk; null for none.
+    Latest(const IntervalWalk& walk, std::string_view key, const Value* initial = nullptr)
+        : walk_(walk), key_(key), initial_(initial) {}
     Latest(const Latest&) = delete;
     Latest& operator=(const Latest&) = delete;
 
@@ -99,9 +106,10 @@ class IntervalWalk {
 
     const IntervalWalk& walk_;
     const std::string_view key_;
-    const std::optional<Value> initial_;
+    const Value* const initial_;
     ValueView value_;  // the latest one in the first searched_ messages
     std::size_t searched_ = 0;
+    bool hasBegun_ = false;     // false until value_ is the value before the first message
     std::size_t lookedUp_ = 0;  // place + 1 of the message that `found_` is from; 0 for none
     ValueView found_;
   };

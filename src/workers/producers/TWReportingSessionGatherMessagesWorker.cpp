@@ -54,10 +54,10 @@ class GatherWalk final : public IntervalWalk {
   }
 
   Latest gather_{*this, TWReportingMessageKeyGatherSession};
-  Latest selectedFormat_{*this, TWReportingMessageKeySelectedFormat, "unknown"};
-  Latest activeDevices_{*this, TWReportingMessageKeyActiveDevices, "unknown"};
-  Latest formatID_{*this, TWReportingMessageKeyFormatID, "unknown"};
-  Latest channels_{*this, TWReportingMessageKeyChannelsPerFrame, -1};
+  Latest selectedFormat_{*this, TWReportingMessageKeySelectedFormat, &kUnknownText};
+  Latest activeDevices_{*this, TWReportingMessageKeyActiveDevices, &kUnknownText};
+  Latest formatID_{*this, TWReportingMessageKeyFormatID, &kUnknownText};
+  Latest channels_{*this, TWReportingMessageKeyChannelsPerFrame, &kMinusOne};
 };
 
 }  // namespace

@@ -79,10 +79,10 @@ class InputWalk final : public IntervalWalk {
 
   const SharedString* process_;     // null gives no summaries
   std::set<std::string> vocoders_;  // the new vocoders since the last summary, each as "name:rate"
-  Latest activeDevices_{*this, TWReportingMessageKeyActiveDevices, "unknown"};
-  Latest vocoder_{*this, TWReportingMessageKeyVpConfigPrimaryVocoder, "unknown"};
-  Latest operationMode_{*this, TWReportingMessageKeyVpConfigOperationMode, "unknown"};
-  Latest inputPort_{*this, TWReportingMessageKeyVpConfigInputPort, "unknown"};
+  Latest activeDevices_{*this, TWReportingMessageKeyActiveDevices, &kUnknownText};
+  Latest vocoder_{*this, TWReportingMessageKeyVpConfigPrimaryVocoder, &kUnknownText};
+  Latest operationMode_{*this, TWReportingMessageKeyVpConfigOperationMode, &kUnknownText};
+  Latest inputPort_{*this, TWReportingMessageKeyVpConfigInputPort, &kUnknownText};
 };
 
 }  // namespace

@@ -63,14 +63,14 @@ class VolumeWalk final : public IntervalWalk {
   }
 
   const SharedString* process_;  // null gives no summaries
-  Latest selectedFormat_{*this, TWReportingMessageKeySelectedFormat, "unknown"};
-  Latest activeDevices_{*this, TWReportingMessageKeyActiveDevices, "unknown"};
-  Latest spatialization_{*this, TWReportingMessageKeySpatializationEnabled, false};
-  Latest ringerState_{*this, TWReportingMessageKeyRingerState, false};
+  Latest selectedFormat_{*this, TWReportingMessageKeySelectedFormat, &kUnknownText};
+  Latest activeDevices_{*this, TWReportingMessageKeyActiveDevices, &kUnknownText};
+  Latest spatialization_{*this, TWReportingMessageKeySpatializationEnabled, &kFalse};
+  Latest ringerState_{*this, TWReportingMessageKeyRingerState, &kFalse};
   Latest volume_{*this, TWReportingMessageKeyVolume};
-  Latest formatID_{*this, TWReportingMessageKeyFormatID, "unknown"};
-  Latest accessoryFeature_{*this, TWReportingMessageKeySpatialAudioAccessoryFeature, false};
-  Latest channels_{*this, TWReportingMessageKeyChannelsPerFrame, -1};
+  Latest formatID_{*this, TWReportingMessageKeyFormatID, &kUnknownText};
+  Latest accessoryFeature_{*this, TWReportingMessageKeySpatialAudioAccessoryFeature, &kFalse};
+  Latest channels_{*this, TWReportingMessageKeyChannelsPerFrame, &kMinusOne};
 };
 
 }  // namespace
