@@ -75,8 +75,11 @@ const TWReportingSessionWorkerClass TWReportingSessionDPWorker::kWorkerClass =
 std::shared_ptr<TWReportingSessionDPWorker> TWReportingSessionDPWorker::initWithSession(
     const std::shared_ptr<TWReportingSession>& session) {
   assert(TWReportingUtilityIsOnReportingServerQueue());
+  const bool isInternalBuild = TWReportingUtilityIsInternalBuild();
+  // Elsewhere the flag is only shown in the log. Looking for its files takes long for a short session.
+  if (!isInternalBuild && !TWReportingDPLogCategory()->isEnabled(LogLevel::kDebug)) return nullptr;
   const bool isEnabled = getEnableFlag(kEnableWhirlcap);
-  if (!TWReportingUtilityIsInternalBuild() || !isEnabled) return nullptr;
+  if (!isInternalBuild || !isEnabled) return nullptr;
   auto worker = std::make_shared<TWReportingSessionDPWorker>();
   worker->session = session;
   const std::int32_t ioBufferSize = getRunTimeDefaults(kIoBufferSize);
