@@ -124,7 +124,8 @@ void appendLogArgument(std::string& out, const T& argument, char conversion) {
 }
 
 // Holds where a line was written. It is made from the category, so that the default arguments take the file
-// and line of the call.
+// and line of the call. Without a category nothing is written, so that a caller can ask once for many lines
+// whether they are enabled.
 struct LogSite {
   LogSite(const LogCategory* logCategory, const char* logFile = __builtin_FILE(),
           int logLine = __builtin_LINE())
@@ -186,7 +187,7 @@ std::string logPrefix(std::string_view file, int line);
 
 template <typename... Arguments>
 void logLine(LogLevel level, const LogSite& site, std::string_view format, const Arguments&... arguments) {
-  if (!site.category->isEnabled(level)) return;
+  if (site.category == nullptr || !site.category->isEnabled(level)) return;
   const std::array<log_detail::Argument, sizeof...(Arguments)> held{log_detail::argumentOf(arguments)...};
   log_detail::write(level, site, format, held);
 }

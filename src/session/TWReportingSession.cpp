@@ -52,6 +52,12 @@ std::optional<ReplacedDate> replacedDate(ValueView time) {
   return std::nullopt;
 }
 
+// Returns null when the session's debug lines are not written. It is asked once for many lines.
+const LogCategory* debugCategory() {
+  const LogCategory* category = TWReportingSessionCategory();
+  return category->isEnabled(LogLevel::kDebug) ? category : nullptr;
+}
+
 bool contains(const WorkerClassList& classes, const TWReportingSessionWorkerClass& wanted) {
   return std::find(classes.begin(), classes.end(), &wanted) != classes.end();
 }
@@ -164,86 +170,82 @@ void TWReportingSession::start() {
 void TWReportingSession::startWorkersFromClasses(
     const std::vector<const TWReportingSessionWorkerClass*>& classes) {
   assert(TWReportingUtilityIsOnReportingServerQueue());
+  const LogCategory* debug = debugCategory();
+  const std::shared_ptr<TWReportingSession> self = shared_from_this();
   {
     const MutexLock lock(propertiesMutex_);
     workers_.reserve(classes.size());
   }
   consumers_.reserve(classes.size());
-  for (const TWReportingSessionWorkerClass* workerClass : classes) makeWorker(*workerClass);
-  for (TWReportingSessionWorkerProtocol* worker : workersInOrder(Order::kConsumersFirst)) {
-    if (!worker->started) startWorker(*worker);
-  }
+  for (const TWReportingSessionWorkerClass* workerClass : classes) makeWorker(*workerClass, self, debug);
+  forEachWorker(Order::kConsumersFirst, [&](TWReportingSessionWorkerProtocol& worker) {
+    if (!worker.started) startWorker(worker, debug);
+  });
 }
 
-void TWReportingSession::makeWorker(const TWReportingSessionWorkerClass& workerClass) {
+void TWReportingSession::makeWorker(const TWReportingSessionWorkerClass& workerClass,
+                                    const std::shared_ptr<TWReportingSession>& self,
+                                    const LogCategory* debug) {
   if (isSingleMessageSession_ && !workerClass.handleSingleMessageSession) {
-    debugLog(TWReportingSessionCategory(),
+    debugLog(debug,
              "Skipping TWReportingSessionWorker for single message session. action=skipped worker=%@ "
              "reporterID=%lli",
              workerClass, reporterID_);
     return;
   }
   if (hasWorkerOf(workerClass)) {
-    debugLog(TWReportingSessionCategory(),
-             "TWReportingSessionWorker already initialized. action=skipped worker=%@ reporterID=%lli",
+    debugLog(debug, "TWReportingSessionWorker already initialized. action=skipped worker=%@ reporterID=%lli",
              workerClass, reporterID_);
     return;
   }
-  debugLog(TWReportingSessionCategory(),
-           "Initializing TWReportingSessionWorker. action=init worker=%@ reporterID=%lli", workerClass,
+  debugLog(debug, "Initializing TWReportingSessionWorker. action=init worker=%@ reporterID=%lli", workerClass,
            reporterID_);
-  auto worker = workerClass.initWithSession(shared_from_this());
+  auto worker = workerClass.initWithSession(self);
   if (worker == nullptr) {
     // A later start tries again, because the service type may have changed by then.
-    debugLog(TWReportingSessionCategory(),
-             "TWReportingSessionWorker failed to initialize. action=failure worker=%@ reporterID=%lli",
+    debugLog(debug, "TWReportingSessionWorker failed to initialize. action=failure worker=%@ reporterID=%lli",
              workerClass, reporterID_);
     return;
   }
   if (workerClass.isConsumer) {
-    auto& consumer = dynamic_cast<TWReportingSessionWorkerConsumerProtocol&>(*worker);
+    auto& consumer = *worker->asConsumer();
     consumers_.push_back({&consumer, &consumer.workerClass(), consumer.handleRedundantMessages()});
   }
   {
     const MutexLock lock(propertiesMutex_);
     workers_.push_back({&workerClass, std::move(worker)});
   }
-  debugLog(TWReportingSessionCategory(), "TWReportingSessionWorker action=added worker=%@ reporterID=%lli",
-           workerClass, reporterID_);
+  debugLog(debug, "TWReportingSessionWorker action=added worker=%@ reporterID=%lli", workerClass,
+           reporterID_);
 }
 
 bool TWReportingSession::hasWorkerOf(const TWReportingSessionWorkerClass& workerClass) const {
-  const MutexLock lock(propertiesMutex_);
   return std::any_of(workers_.begin(), workers_.end(),
                      [&](const MadeWorker& made) { return made.workerClass == &workerClass; });
 }
 
-void TWReportingSession::startWorker(TWReportingSessionWorkerProtocol& worker) {
+void TWReportingSession::startWorker(TWReportingSessionWorkerProtocol& worker, const LogCategory* debug) {
   const std::optional<bool> result = worker.start();
   worker.started = result.value_or(true);
   if (!result) return;
-  debugLog(TWReportingSessionCategory(),
-           "TWReportingSessionWorker action=start worker=%@ started=%@ reporterID=%lli", worker.workerClass(),
-           yesOrNo(worker.started), reporterID_);
+  debugLog(debug, "TWReportingSessionWorker action=start worker=%@ started=%@ reporterID=%lli",
+           worker.workerClass(), yesOrNo(worker.started), reporterID_);
 }
 
-// Returns each worker once. Workers that are both come with the role that `order` has first. The order within
-// a role is the one in which they were made.
-std::vector<TWReportingSessionWorkerProtocol*> TWReportingSession::workersInOrder(Order order) const {
+// By index, because a worker may make the session make others, which moves them.
+template <typename Visitor>
+void TWReportingSession::forEachWorker(Order order, Visitor visit) {
   using Class = TWReportingSessionWorkerClass;
   const bool consumersFirst = order == Order::kConsumersFirst;
   const auto first = consumersFirst ? &Class::isConsumer : &Class::isProducer;
   const auto second = consumersFirst ? &Class::isProducer : &Class::isConsumer;
   const auto rankOf = [&](const Class& made) { return made.*first ? 0 : made.*second ? 1 : 2; };
-  std::vector<TWReportingSessionWorkerProtocol*> ordered;
-  const MutexLock lock(propertiesMutex_);
-  ordered.reserve(workers_.size());
+  const std::size_t count = workers_.size();
   for (int rank = 0; rank < 3; ++rank) {
-    for (const MadeWorker& made : workers_) {
-      if (rankOf(*made.workerClass) == rank) ordered.push_back(made.worker.get());
+    for (std::size_t at = 0; at < count; ++at) {
+      if (rankOf(*workers_[at].workerClass) == rank) visit(*workers_[at].worker);
     }
   }
-  return ordered;
 }
 
 void TWReportingSession::sendMessage(const std::shared_ptr<TWReportingSessionMessage>& message,
@@ -302,13 +304,14 @@ void TWReportingSession::stop() {
   messages_.sortByTime();
   for (const auto* message : messages_) newest_[{message->category, message->type}] = message;
 
-  for (TWReportingSessionWorkerProtocol* worker : workersInOrder(Order::kProducersFirst)) {
-    if (!worker->started) continue;
-    worker->stop();
-    worker->started = false;
-    debugLog(TWReportingSessionCategory(), "TWReportingSessionWorker action=stop worker=%@ reporterID=%lli",
-             worker->workerClass(), reporterID_);
-  }
+  const LogCategory* debug = debugCategory();
+  forEachWorker(Order::kProducersFirst, [&](TWReportingSessionWorkerProtocol& worker) {
+    if (!worker.started) return;
+    worker.stop();
+    worker.started = false;
+    debugLog(debug, "TWReportingSessionWorker action=stop worker=%@ reporterID=%lli", worker.workerClass(),
+             reporterID_);
+  });
   logUnkeptCount();
   forgetMessages();
   totalMessageCount_ = 0;

@@ -19,6 +19,8 @@ class TWReportingSessionWorkerConsumerProtocol : public virtual TWReportingSessi
 
   // True when the worker also wants redundant messages. Always the same for one worker.
   virtual bool handleRedundantMessages() const { return false; }
+
+  TWReportingSessionWorkerConsumerProtocol* asConsumer() final { return this; }
 };
 
 }  // namespace tonewerk

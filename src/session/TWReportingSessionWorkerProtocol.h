@@ -7,6 +7,7 @@
 namespace tonewerk {
 
 class TWReportingSession;
+class TWReportingSessionWorkerConsumerProtocol;
 struct TWReportingSessionWorkerClass;
 
 // Turns a session's messages into one kind of report. A session has at most one worker of a class. It
@@ -25,6 +26,10 @@ class TWReportingSessionWorkerProtocol {
   // counts as started.
   virtual std::optional<bool> start() { return std::nullopt; }
   virtual void stop() {}
+
+  // Returns the worker as a consumer; null when it is none. Faster than a cast, which a session would make
+  // for each consumer.
+  virtual TWReportingSessionWorkerConsumerProtocol* asConsumer() { return nullptr; }
 
   // The session that owns the worker; it may be gone.
   std::weak_ptr<TWReportingSession> session;

@@ -57,6 +57,16 @@ TEST(LogTest, ShowsValuesListsAndAbsentValues) {
   EXPECT_THAT(log.textsOf("twrs"), ElementsAre(R"({"a":1} (null) (1, 2) (null))"));
 }
 
+TEST(LogTest, FormatsNothingWithoutACategory) {
+  const LogCategory* none = nullptr;
+  bool wasAsked = false;
+  errorLog(none, "%@", [&] {
+    wasAsked = true;
+    return std::string("x");
+  });
+  EXPECT_FALSE(wasAsked);
+}
+
 TEST(LogTest, FormatsNothingBelowTheThreshold) {
   MemoryLog log;
   log.setThreshold("twrs", LogLevel::kError);
