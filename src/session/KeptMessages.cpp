@@ -14,12 +14,13 @@ TWReportingSessionMessage& KeptMessages::add(const TWReportingSessionMessage& me
   return added;
 }
 
-void KeptMessages::sortByTime() {
+bool KeptMessages::sortByTime() {
   const std::vector<std::size_t> places = placesByTime(*this);
-  if (places.empty()) return;
+  if (places.empty()) return false;
   PieceVector<TWReportingSessionMessage> sorted;
   for (const std::size_t place : places) sorted.add(std::move(messages_[place]));
   messages_ = std::move(sorted);
+  return true;
 }
 
 void KeptMessages::clear() {

@@ -23,8 +23,9 @@ class KeptMessages {
 
   // Adds a copy of the message.
   TWReportingSessionMessage& add(const TWReportingSessionMessage& message);
-  // Sorts by epochTime(), ascending and stable. A time that is not a number counts as 0.
-  void sortByTime();
+  // Sorts by epochTime(), ascending and stable. A time that is not a number counts as 0. Returns false when
+  // all were in order.
+  bool sortByTime();
   // Frees all memory that nobody else holds.
   void clear();
 

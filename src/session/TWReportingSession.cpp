@@ -301,8 +301,9 @@ void TWReportingSession::stop() {
   if (!started_) return logUnkeptCount();
   debugLog(TWReportingSessionCategory(), "ending session. reporterID=%lli", reporterID_);
   emitTracePoint(TWReportingTracePoint::kSessionEnding);
-  messages_.sortByTime();
-  for (const auto* message : messages_) newest_[{message->category, message->type}] = message;
+  if (messages_.sortByTime()) {
+    for (const auto* message : messages_) newest_[{message->category, message->type}] = message;
+  }
 
   const LogCategory* debug = debugCategory();
   forEachWorker(Order::kProducersFirst, [&](TWReportingSessionWorkerProtocol& worker) {
@@ -322,7 +323,7 @@ void TWReportingSession::stop() {
 
 std::shared_ptr<TWReportingSessionMessage> TWReportingSession::lifecycleMessage(
     AudioEventType type, const LifecycleTexts& texts) const {
-  constexpr std::size_t kEntries = 8;  // with those that are added below
+  constexpr std::size_t kEntries = 8;
   const std::uint64_t count = messages_.size();
   ValueMap payload;
   payload.reserve(kEntries);
@@ -331,10 +332,12 @@ std::shared_ptr<TWReportingSessionMessage> TWReportingSession::lifecycleMessage(
   payload.add(texts.uniqueMessagesAt, count);
   payload.add(kReporterID, reporterID_);
   payload.add(texts.runningAt, started_ ? kYes : kNo);
-  auto message = std::make_shared<TWReportingSessionMessage>(std::move(payload), kCategorySetup, type);
-  addMissingDates(*message);
-  addAudioMessageTag(*message);
-  return message;
+  // What addMissingDates() and addAudioMessageTag() add.
+  TWReportingContext& context = TWReportingContext::current();
+  payload.add(TWReportingInternalEventInvalidTimestamp, kNilText);
+  payload.add(TWReportingInternalEventEpochTime, context.platform().clock.now());
+  payload.add(TWReportingInternalEventAudioTag, context.names().audioTag(kCategorySetup, type));
+  return std::make_shared<TWReportingSessionMessage>(std::move(payload), kCategorySetup, type);
 }
 
 const TWReportingSessionMessage* TWReportingSession::store(const TWReportingSessionMessage& message) {

@@ -32,13 +32,14 @@ double TWReportingSessionMessage::epochTime() const {
   return message.number(TWReportingInternalEventEpochTime);
 }
 
-void TWReportingSessionMessage::sortMessages(TWReportingSessionMessages& messages) {
+bool TWReportingSessionMessage::sortMessages(TWReportingSessionMessages& messages) {
   const std::vector<std::size_t> places = placesByTime(messages);
-  if (places.empty()) return;
+  if (places.empty()) return false;
   TWReportingSessionMessages sorted;
   sorted.reserve(messages.size());
   for (const std::size_t place : places) sorted.push_back(std::move(messages[place]));
   messages = std::move(sorted);
+  return true;
 }
 
 void TWReportingSessionMessage::lock() const {

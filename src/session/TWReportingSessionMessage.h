@@ -61,8 +61,9 @@ class TWReportingSessionMessage {
   // The "twreporting_timestamp" in seconds since 1970; 0 when there is none.
   double epochTime() const;
 
-  // Sorts by epochTime(), ascending and stable. A time that is not a number counts as 0.
-  static void sortMessages(std::vector<std::shared_ptr<TWReportingSessionMessage>>& messages);
+  // Sorts by epochTime(), ascending and stable. A time that is not a number counts as 0. Returns false when
+  // the messages were in order.
+  static bool sortMessages(std::vector<std::shared_ptr<TWReportingSessionMessage>>& messages);
 
   // If not empty, only consumers of these classes get the message.
   WorkerClassList destinationWorkers;

@@ -103,9 +103,10 @@ RC_GTEST_FIXTURE_PROP(TWReportingSessionMessageTest, SortsLikeAStableSortOfTheTi
   TWReportingSessionMessages expected = messages;
   std::stable_sort(expected.begin(), expected.end(),
                    [](const auto& a, const auto& b) { return a->epochTime() < b->epochTime(); });
-  RC_CLASSIFY(expected == messages, "in order");
+  const bool isInOrder = expected == messages;
+  RC_CLASSIFY(isInOrder, "in order");
 
-  TWReportingSessionMessage::sortMessages(messages);
+  RC_ASSERT(TWReportingSessionMessage::sortMessages(messages) == !isInOrder);
   RC_ASSERT(messages == expected);  // the same records
 }
 
