@@ -47,20 +47,26 @@ void ObservableMap::notify(std::string_view key) {
   for (auto next = observers_.begin(); next != observers_.end() && next->first <= last;) {
     const std::uint64_t identifier = next->first;
     if (next->second.key == key) {
-      const std::shared_ptr<const Observer> observer = next->second.observer;
+      const SharedObserver observer = next->second.observer;
       (*observer)(key);
     }
     next = observers_.upper_bound(identifier);
   }
 }
 
-ObservableMap::Observation ObservableMap::observe(const std::shared_ptr<ObservableMap>& map,
-                                                  std::string_view key, Observer observer) {
+ObservableMap::Observation ObservableMap::observe(const std::shared_ptr<ObservableMap>& map, SharedString key,
+                                                  SharedObserver observer) {
   const RecursiveMutexLock lock(map->mutex_);
   const std::uint64_t identifier = ++map->lastIdentifier_;
-  map->observers_.emplace(
-      identifier, Registration{std::string(key), std::make_shared<const Observer>(std::move(observer))});
+  // Identifiers ascend.
+  map->observers_.emplace_hint(map->observers_.end(), identifier,
+                               Registration{std::move(key), std::move(observer)});
   return {map, identifier};
+}
+
+ObservableMap::Observation ObservableMap::observe(const std::shared_ptr<ObservableMap>& map, SharedString key,
+                                                  Observer observer) {
+  return observe(map, std::move(key), std::make_shared<const Observer>(std::move(observer)));
 }
 
 std::size_t ObservableMap::observerCount() const {

@@ -10,6 +10,7 @@
 #include <string_view>
 
 #include "values/Mutex.h"
+#include "values/SharedString.h"
 #include "values/Value.h"
 
 namespace tonewerk {
@@ -34,6 +35,8 @@ namespace tonewerk {
 class ObservableMap {
  public:
   using Observer = std::function<void(std::string_view key)>;
+  // May observe several keys.
+  using SharedObserver = std::shared_ptr<const Observer>;
 
   // Keeps one observer of one key registered until it is destroyed. Keeps the map alive.
   class Observation {
@@ -66,7 +69,9 @@ class ObservableMap {
   void set(std::string_view key, ValueMap value);
 
   // Takes `map` as an argument, because the observation shares its ownership.
-  [[nodiscard]] static Observation observe(const std::shared_ptr<ObservableMap>& map, std::string_view key,
+  [[nodiscard]] static Observation observe(const std::shared_ptr<ObservableMap>& map, SharedString key,
+                                           SharedObserver observer);
+  [[nodiscard]] static Observation observe(const std::shared_ptr<ObservableMap>& map, SharedString key,
                                            Observer observer);
   std::size_t observerCount() const;
 
@@ -75,8 +80,8 @@ class ObservableMap {
 
  private:
   struct Registration {
-    std::string key;
-    std::shared_ptr<const Observer> observer;  // shared with a running call of it
+    SharedString key;
+    SharedObserver observer;  // shared with a running call of it
   };
 
   void notify(std::string_view key) REQUIRES(mutex_);

@@ -22,19 +22,19 @@ const TWReportingSessionWorkerClass TWReportingSessionSystemMonitorWorker::kWork
 
 TWReportingSessionSystemMonitorWorker::TWReportingSessionSystemMonitorWorker(
     const std::shared_ptr<TWReportingSession>& owner)
-    : systemMonitorDictionary_(TWReportingSystemMonitor::getSystemMonitorDictionary()),
-      featureKeys_(TWReportingSystemMonitor::getSystemMonitorKeys()) {
+    : features_(TWReportingSystemMonitor::getFeatures()) {
   session = owner;
 }
 
 std::optional<bool> TWReportingSessionSystemMonitorWorker::start() {
   assert(TWReportingUtilityIsOnReportingServerQueue());
-  if (systemMonitorDictionary_ == nullptr) return true;
-  for (const std::string& key : featureKeys_) {
+  if (features_.states == nullptr) return true;
+  const auto observer = std::make_shared<const ObservableMap::Observer>(
+      [this](std::string_view changed) { observeValueForKeyPath(changed); });
+  observations_.reserve(features_.names->size());
+  for (const SharedString& key : *features_.names) {
     observeValueForKeyPath(key);  // sends the current state
-    observations_.push_back(
-        ObservableMap::observe(systemMonitorDictionary_, key,
-                               [this](std::string_view changed) { observeValueForKeyPath(changed); }));
+    observations_.push_back(ObservableMap::observe(features_.states, key, observer));
   }
   return true;
 }
@@ -45,13 +45,14 @@ void TWReportingSessionSystemMonitorWorker::stop() {
 }
 
 void TWReportingSessionSystemMonitorWorker::observeValueForKeyPath(std::string_view key) {
-  const std::optional<ValueMap> state = systemMonitorDictionary_->find(key);
+  const std::optional<ValueMap> state = features_.states->find(key);
   handleChange(state ? &*state : nullptr);
 }
 
 void TWReportingSessionSystemMonitorWorker::handleChange(const ValueMap* state) {
   assert(TWReportingUtilityIsOnReportingServerQueue());
-  ValueMap payload = state == nullptr ? ValueMap() : *state;
+  if (state == nullptr) return;
+  ValueMap payload = *state;
   if (const Value* readAt = payload.find(TWReportingInternalEventEpochTime)) {
     payload.set(kLastUpdated, Value(*readAt));  // a copy, because set() may move the entries of the map
     // The session adds the time at which the message is sent.

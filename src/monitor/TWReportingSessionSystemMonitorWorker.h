@@ -3,11 +3,11 @@
 
 #include <memory>
 #include <optional>
-#include <string>
 #include <string_view>
 #include <vector>
 
 #include "monitor/ObservableMap.h"
+#include "monitor/TWReportingSystemMonitor.h"
 #include "session/TWReportingSessionWorkerClass.h"
 
 namespace tonewerk {
@@ -35,8 +35,7 @@ class TWReportingSessionSystemMonitorWorker final : public TWReportingSessionWor
  private:
   void observeValueForKeyPath(std::string_view key);
 
-  const std::shared_ptr<ObservableMap> systemMonitorDictionary_;  // null when there was no monitor
-  const std::vector<std::string> featureKeys_;
+  const TWReportingSystemMonitor::Features features_;     // null when there was no monitor
   std::vector<ObservableMap::Observation> observations_;  // last, so that they end before the members above
 };
 

@@ -51,9 +51,9 @@ struct SharedMonitor {
   }
 };
 
-std::vector<std::string> namesOf(const ValueMap& features) {
-  std::vector<std::string> names;
-  for (const ValueMap::Entry& feature : features) names.push_back(feature.key.string());
+std::shared_ptr<const std::vector<SharedString>> namesOf(const ValueMap& features) {
+  auto names = std::make_shared<std::vector<SharedString>>();
+  for (const ValueMap::Entry& feature : features) names->push_back(feature.key);
   return names;
 }
 
@@ -72,7 +72,16 @@ std::shared_ptr<ObservableMap> TWReportingSystemMonitor::getSystemMonitorDiction
 
 std::vector<std::string> TWReportingSystemMonitor::getSystemMonitorKeys() {
   const auto monitor = SharedMonitor::ofProcess().get();
-  return monitor == nullptr ? std::vector<std::string>() : monitor->featureNames_;
+  std::vector<std::string> keys;
+  if (monitor == nullptr) return keys;
+  for (const SharedString& name : *monitor->featureNames_) keys.push_back(name.string());
+  return keys;
+}
+
+TWReportingSystemMonitor::Features TWReportingSystemMonitor::getFeatures() {
+  const auto monitor = SharedMonitor::ofProcess().get();
+  if (monitor == nullptr) return {};
+  return {monitor->systemMonitorDictionary_, monitor->featureNames_};
 }
 
 void TWReportingSystemMonitor::reset() {

@@ -39,6 +39,12 @@ class TWReportingSystemMonitor : public std::enable_shared_from_this<TWReporting
   static std::shared_ptr<ObservableMap> getSystemMonitorDictionary();
   // The names of all features in the order of the feature table. Empty without a monitor.
   static std::vector<std::string> getSystemMonitorKeys();
+  // The monitor's map and the names of all features, without copies. Both null without a monitor.
+  struct Features {
+    std::shared_ptr<ObservableMap> states;
+    std::shared_ptr<const std::vector<SharedString>> names;
+  };
+  static Features getFeatures();
   // Ends the registrations and drops the monitor. Call it on the monitor's queue, or while that runs nothing.
   static void reset();
 
@@ -72,7 +78,7 @@ class TWReportingSystemMonitor : public std::enable_shared_from_this<TWReporting
   SerialQueue& queue_;
   NotificationService& notifications_;
   const std::shared_ptr<ObservableMap> systemMonitorDictionary_ = std::make_shared<ObservableMap>();
-  const std::vector<std::string> featureNames_;  // in the order of the feature table
+  const std::shared_ptr<const std::vector<SharedString>> featureNames_;  // in the order of the feature table
   // One descriptor for each feature, by its name.
   ValueMap features_ GUARDED_BY(systemMonitorDictionary_->mutex());
 };

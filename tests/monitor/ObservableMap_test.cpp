@@ -47,6 +47,18 @@ TEST_F(ObservableMapTest, NotifiesTheObserversOfAKeyInOrderBeforeSetReturns) {
   EXPECT_THAT(notified, ElementsAre(R"(first a{"n":1})", R"(second a{"n":1})"));
 }
 
+TEST_F(ObservableMapTest, AnObserverMayObserveSeveralKeys) {
+  const auto observer = std::make_shared<const ObservableMap::Observer>(recorder("it"));
+  auto first = ObservableMap::observe(map, "a", observer);
+  const auto second = ObservableMap::observe(map, "b", observer);
+  map->set("a", {{"n", 1}});
+  map->set("b", {{"n", 2}});
+  first = {};
+  map->set("a", {{"n", 3}});
+  map->set("b", {{"n", 4}});
+  EXPECT_THAT(notified, ElementsAre(R"(it a{"n":1})", R"(it b{"n":2})", R"(it b{"n":4})"));
+}
+
 TEST_F(ObservableMapTest, SettingAnEqualValueNotifiesToo) {
   const auto observation = observe("a", recorder("it"));
   map->set("a", {{"n", 1}});

@@ -60,6 +60,15 @@ TEST_F(SystemMonitorTest, TheKeysAreTheFeaturesInTheTablesOrder) {
               ElementsAre(kAccessory, "device_name", "ringerstate"));
 }
 
+TEST_F(SystemMonitorTest, TheFeaturesAreTheDictionaryAndTheKeys) {
+  EXPECT_EQ(TWReportingSystemMonitor::getFeatures().states, nullptr);
+  EXPECT_EQ(TWReportingSystemMonitor::getFeatures().names, nullptr);
+  initialize();
+  const auto features = TWReportingSystemMonitor::getFeatures();
+  EXPECT_EQ(features.states, map());
+  EXPECT_THAT(*features.names, ElementsAre(kAccessory, "device_name", "ringerstate"));
+}
+
 TEST_F(SystemMonitorTest, InitializingTwiceKeepsTheFirstMonitorAndItsQueue) {
   initialize();
   const auto first = map();
