@@ -103,6 +103,8 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   AudioServiceType serviceType() const { return serviceType_; }
   const std::string& serviceName() const { return serviceName_; }
   ValueMap configuration() const;
+  // TWReportingUtilityRetrieveAppName() of the configuration.
+  const SharedString& applicationName() const { return applicationName_; }
   // The latest value of every key received.
   ValueMap previousValues() const;
   void addPreviousValues(const ValueMap& values);

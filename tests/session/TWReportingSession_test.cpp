@@ -94,6 +94,14 @@ TEST_F(TWReportingSessionTest, DescribesItself) {
 
 // Configuration.
 
+TEST_F(TWReportingSessionTest, ItsApplicationNameIsThatOfItsConfiguration) {
+  const auto session = makeSession();
+  EXPECT_EQ(session->applicationName(), "Unknown");
+  const ValueMap configuration{{"HostApplicationDisplayID", "com.orvane.player"}};
+  EXPECT_TRUE(session->updateConfigurationWithContentsOfConfiguration(&configuration));
+  EXPECT_EQ(session->applicationName(), "com.orvane.player");
+}
+
 TEST_F(TWReportingSessionTest, AddsToItsConfiguration) {
   const auto session = makeSession();
   const ValueMap first{{"a", 1}, {"b", 1}};

@@ -94,7 +94,7 @@ void TWReportingSessionInputMessagesWorker::stop() {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto owner = session.lock();
   if (owner == nullptr || owner->messages().empty()) return;
-  const SharedString application = TWReportingUtilityRetrieveAppName(owner->configuration());
+  const SharedString application = owner->applicationName();
   const TWReportingSessionMessages summaries = createInputMessages(
       owner->messages(), &application, TWReportingUtilityVolumeMinimumPlayingTime(owner->serviceType()));
   if (summaries.empty()) return;

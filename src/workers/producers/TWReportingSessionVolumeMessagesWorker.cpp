@@ -82,7 +82,7 @@ void TWReportingSessionVolumeMessagesWorker::stop() {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto owner = session.lock();
   if (owner == nullptr || owner->messages().empty()) return;
-  const SharedString application = TWReportingUtilityRetrieveAppName(owner->configuration());
+  const SharedString application = owner->applicationName();
   const TWReportingSessionMessages summaries = createVolumeMessages(
       owner->messages(), &application, TWReportingUtilityVolumeMinimumPlayingTime(owner->serviceType()));
   if (summaries.empty()) return;

@@ -104,7 +104,7 @@ ValueMap TWReportingSessionSummaryWorker::summaryOf(const TWReportingSession& ow
   summary.add(kRedundantMessageCount, received - stored);
   summary.add(kSingleMessageSession, owner.isSingleMessageSession());
   summary.add(kServiceName, owner.serviceName());
-  summary.add(TWReportingApplicationName, TWReportingUtilityRetrieveAppName(owner.configuration()));
+  summary.add(TWReportingApplicationName, owner.applicationName());
   if (const auto name = owner.clientProcessName()) summary.add(kClientProcessName, *name);
   addDeviceState(summary);
   return summary;
