@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <cassert>
+#include <iterator>
 #include <mutex>
 
 #include "platform/Clock.h"
@@ -172,20 +173,25 @@ void TWReportingSession::startWorkersFromClasses(
   assert(TWReportingUtilityIsOnReportingServerQueue());
   const LogCategory* debug = debugCategory();
   const std::shared_ptr<TWReportingSession> self = shared_from_this();
+  consumers_.reserve(classes.size());
+  std::vector<MadeWorker> made;
+  made.reserve(classes.size());
+  for (const TWReportingSessionWorkerClass* workerClass : classes) {
+    makeWorker(*workerClass, self, debug, made);
+  }
   {
     const MutexLock lock(propertiesMutex_);
-    workers_.reserve(classes.size());
+    workers_.reserve(workers_.size() + made.size());
+    std::move(made.begin(), made.end(), std::back_inserter(workers_));
   }
-  consumers_.reserve(classes.size());
-  for (const TWReportingSessionWorkerClass* workerClass : classes) makeWorker(*workerClass, self, debug);
   forEachWorker(Order::kConsumersFirst, [&](TWReportingSessionWorkerProtocol& worker) {
     if (!worker.started) startWorker(worker, debug);
   });
 }
 
 void TWReportingSession::makeWorker(const TWReportingSessionWorkerClass& workerClass,
-                                    const std::shared_ptr<TWReportingSession>& self,
-                                    const LogCategory* debug) {
+                                    const std::shared_ptr<TWReportingSession>& self, const LogCategory* debug,
+                                    std::vector<MadeWorker>& made) {
   if (isSingleMessageSession_ && !workerClass.handleSingleMessageSession) {
     debugLog(debug,
              "Skipping TWReportingSessionWorker for single message session. action=skipped worker=%@ "
@@ -193,7 +199,8 @@ void TWReportingSession::makeWorker(const TWReportingSessionWorkerClass& workerC
              workerClass, reporterID_);
     return;
   }
-  if (hasWorkerOf(workerClass)) {
+  const auto isOfClass = [&](const MadeWorker& worker) { return worker.workerClass == &workerClass; };
+  if (hasWorkerOf(workerClass) || std::any_of(made.begin(), made.end(), isOfClass)) {
     debugLog(debug, "TWReportingSessionWorker already initialized. action=skipped worker=%@ reporterID=%lli",
              workerClass, reporterID_);
     return;
@@ -211,10 +218,7 @@ void TWReportingSession::makeWorker(const TWReportingSessionWorkerClass& workerC
     auto& consumer = *worker->asConsumer();
     consumers_.push_back({&consumer, &consumer.workerClass(), consumer.handleRedundantMessages()});
   }
-  {
-    const MutexLock lock(propertiesMutex_);
-    workers_.push_back({&workerClass, std::move(worker)});
-  }
+  made.push_back({&workerClass, std::move(worker)});
   debugLog(debug, "TWReportingSessionWorker action=added worker=%@ reporterID=%lli", workerClass,
            reporterID_);
 }

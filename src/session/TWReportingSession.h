@@ -161,15 +161,17 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   [[nodiscard]] bool completePacked(TWReportingSessionMessage& message) const;
   std::shared_ptr<TWReportingSessionMessage> lifecycleMessage(AudioEventType type,
                                                               const LifecycleTexts& texts) const;
-  // In these, `debug` is null when debug lines are not written. `self` is this session.
+  // In these, `debug` is null when debug lines are not written. `self` is this session. makeWorker() adds a
+  // worker to `made` unless there is one or it does not apply to the session.
   void makeWorker(const TWReportingSessionWorkerClass& workerClass,
-                  const std::shared_ptr<TWReportingSession>& self, const LogCategory* debug);
+                  const std::shared_ptr<TWReportingSession>& self, const LogCategory* debug,
+                  std::vector<MadeWorker>& made);
   void startWorker(TWReportingSessionWorkerProtocol& worker, const LogCategory* debug);
   // These read workers_ without the lock, because only the work queue writes them, and it calls these.
   bool hasWorkerOf(const TWReportingSessionWorkerClass& workerClass) const NO_THREAD_SAFETY_ANALYSIS;
-  // Calls visit(TWReportingSessionWorkerProtocol&) once for each worker that there is at the call. Workers that
-  // are both come with the role that `order` has first. The order within a role is the one in which they were
-  // made.
+  // Calls visit(TWReportingSessionWorkerProtocol&) once for each worker that there is at the call. Workers
+  // that are both come with the role that `order` has first. The order within a role is the one in which they
+  // were made.
   template <typename Visitor>
   void forEachWorker(Order order, Visitor visit) NO_THREAD_SAFETY_ANALYSIS;
   // The workers whose class has `role`.
