@@ -10,6 +10,7 @@
 #include <filesystem>
 #include <iterator>
 #include <memory>
+#include <stdexcept>
 #include <string>
 #include <system_error>
 #include <utility>
@@ -18,11 +19,13 @@
 #include "QuietDoubles.h"
 #include "platform/linux/files/LinuxFileSystem.h"
 #include "platform/linux/json/NlohmannJsonService.h"
+#include "session/MessageShapes.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionMessage.h"
 #include "support/TemporaryDirectory.h"
 #include "support/TestPlatform.h"
+#include "values/PackedMap.h"
 #include "workers/TWReportingWorkerClasses.h"
 #include "workers/producers/TWReportingSessionGatherMessagesWorker.h"
 #include "workers/producers/TWReportingSessionInputMessagesWorker.h"
@@ -42,12 +45,12 @@ constexpr AudioServiceType kLongFormAudio = 7;
 constexpr std::size_t kUnbounded = std::size_t{1} << 40;
 constexpr double kMinimumSeconds = 0.5;
 
-// Describes a playing stream as the ingest benchmark's messages do. As in a connection, the keys and the
-// texts are shared, and each message has its own map. Every `changeEvery`th message has another volume, and
-// the message after it is one of a head tracker; 0 for never.
+// Describes a playing stream as the ingest benchmark's messages do. As in a connection, the messages are
+// packed, and those of one kind share a shape. Every `changeEvery`th message has another volume, and the
+// message after it is one of a head tracker; 0 for never.
 class Stream {
  public:
-  explicit Stream(std::size_t changeEvery) : changeEvery_(changeEvery) {}
+  Stream(std::size_t changeEvery, ShapeTable& shapes) : changeEvery_(changeEvery), shapes_(shapes) {}
 
   std::vector<ValueMap> payloads(std::size_t count) {
     std::vector<ValueMap> payloads;
@@ -69,35 +72,32 @@ class Stream {
   ValueMap payload(std::size_t at) {
     const double time = start_ + static_cast<double>(at) * 0.02;
     if (changeEvery_ != 0 && at % changeEvery_ == 0) volume_ = volume_ == 0.4375 ? 0.5 : 0.4375;
-    if (changeEvery_ != 0 && at % changeEvery_ == 1) return {{timeKey_, time}, {spatialKey_, at % 2 == 0}};
-    ValueMap payload;
-    payload.reserve(8);
-    payload.set(timeKey_, time);
-    payload.set(runningKey_, true);
-    payload.set(formatKey_, format_);
-    payload.set(devicesKey_, devices_);
-    payload.set(formatIDKey_, formatID_);
-    payload.set(channelsKey_, 2);
-    payload.set(volumeKey_, volume_);
-    payload.set(positionKey_, at);
-    return payload;
+    if (changeEvery_ != 0 && at % changeEvery_ == 1)
+      return packed({{"twreporting_timestamp", time}, {"spatializationEnabled", at % 2 == 0}});
+    return packed({{"twreporting_timestamp", time},
+                   {"session_output_running", true},
+                   {"session_selected_format", "48000 Hz, 2 ch, Float32, interleaved"},
+                   {"active_devices", "Speaker"},
+                   {"mFormatID", "lpcm"},
+                   {"mChannelsPerFrame", 2},
+                   {"QMSessionVolume", volume_},
+                   {"position", at}});
+  }
+
+  ValueMap packed(const std::vector<ValueMapEntry>& entries) {
+    ShapeTable::Place place = ShapeTable::root();
+    std::string values;
+    for (const ValueMapEntry& entry : entries) {
+      place = shapes_.next(place, entry.key);
+      if (!appendEncoded(values, entry.value)) throw std::invalid_argument("a value cannot be packed");
+    }
+    return ValueMap(PackedMap::make(*shapes_.shapeAt(place), values));
   }
 
   const std::size_t changeEvery_;
+  ShapeTable& shapes_;
   const double start_ = RunningClock().now();
   double volume_ = 0.4375;
-  const SharedString timeKey_{"twreporting_timestamp"};
-  const SharedString runningKey_{"session_output_running"};
-  const SharedString formatKey_{"session_selected_format"};
-  const SharedString devicesKey_{"active_devices"};
-  const SharedString formatIDKey_{"mFormatID"};
-  const SharedString channelsKey_{"mChannelsPerFrame"};
-  const SharedString volumeKey_{"QMSessionVolume"};
-  const SharedString positionKey_{"position"};
-  const SharedString spatialKey_{"spatializationEnabled"};
-  const SharedString format_{"48000 Hz, 2 ch, Float32, interleaved"};
-  const SharedString devices_{"Speaker"};
-  const SharedString formatID_{"lpcm"};
 };
 
 class Core {
@@ -105,7 +105,8 @@ class Core {
   explicit Core(bool hasFile = true) : context_(platform(), classes(hasFile)) {}
 
   std::shared_ptr<TWReportingSession> makeSession(AudioServiceType serviceType) {
-    auto session = TWReportingSession::initWithID(77, {4711}, std::make_shared<KeptBytesBudget>(kUnbounded));
+    auto session = TWReportingSession::initWithID(77, {4711}, std::make_shared<KeptBytesBudget>(kUnbounded),
+                                                  makeMessageShapes());
     session->setServiceType(serviceType);
     const ValueMap configuration{{"HostApplicationDisplayID", "com.example.player"}};
     (void)session->updateConfigurationWithContentsOfConfiguration(&configuration);
@@ -115,7 +116,10 @@ class Core {
 
   std::shared_ptr<TWReportingSession> makeFullSession(AudioServiceType serviceType, std::size_t changeEvery) {
     auto session = makeSession(serviceType);
-    for (const auto& record : Stream(changeEvery).records(kStored)) session->sendMessage(record);
+    for (auto& record : Stream(changeEvery, *session->shapes()).records(kStored)) {
+      session->sendMessage(record);
+      record.reset();
+    }
     return session;
   }
 
