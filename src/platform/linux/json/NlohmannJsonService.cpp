@@ -1,13 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/json/NlohmannJsonService.h"
 
-#include <algorithm>
-#include <cmath>
 #include <limits>
 #include <nlohmann/json.hpp>
 
-#include "values/CompactJson.h"
-#include "values/ValueView.h"
+#include "values/PrettyJson.h"
 
 namespace tonewerk {
 namespace {
@@ -46,116 +43,6 @@ class Path {
 
   std::string text_;
   int depth_ = 0;
-};
-
-// Writes directly into the text, because a session's file holds all its messages: building the library's tree
-// first would cost several times as much.
-class PrettyWriter {
- public:
-  explicit PrettyWriter(std::string& out) : out_(out) {}
-
-  // False if JSON cannot express a value; problem() then names it.
-  bool write(const ValueMap& map) {
-    return writeList('{', '}', map.empty(), [&](auto&& writeElement) {
-      map.forEach([&](const SharedString& key, ValueView value) {
-        writeElement([&] {
-          writeKey(key);
-          return write(value) || isWithin(key.string());
-        });
-      });
-    });
-  }
-  std::string problem() const { return place_ + " is " + inexpressible_ + ", which JSON cannot say"; }
-
- private:
-  bool write(ValueView view) {
-    const Value* value = view.held();
-    if (value == nullptr) return writeEncoded(view.encoded());
-    if (const ValueMap* map = value->asMap()) return write(*map);
-    if (const ValueArray* array = value->asArray()) {
-      return writeList('[', ']', array->empty(), [&](auto&& writeElement) {
-        std::size_t index = 0;
-        for (const Value& element : *array) {
-          writeElement([&] { return write(element) || isWithin("[" + std::to_string(index) + "]"); });
-          ++index;
-        }
-      });
-    }
-    const double* number = value->asDouble();
-    if (number != nullptr && !std::isfinite(*number)) return isInexpressible(view);
-    appendCompactJson(out_, *value);
-    return true;
-  }
-
-  // Only arrays and maps inside a packed map get values of their own.
-  bool writeEncoded(EncodedValue value) {
-    const Value::Kind kind = value.kind();
-    if (kind == Value::Kind::kArray || kind == Value::Kind::kMap) return write(ValueView(value.value()));
-    if (kind == Value::Kind::kDouble && !std::isfinite(ValueView(value).number())) {
-      return isInexpressible(ValueView(value));
-    }
-    appendCompactJson(out_, value);
-    return true;
-  }
-
-  bool isInexpressible(ValueView value) {
-    inexpressible_ = value.text();
-    return false;
-  }
-
-  // Nearly all keys need no escapes, and for those no value has to be made.
-  void writeKey(const SharedString& key) {
-    const std::string_view text = key;
-    const auto needsEscape = [](char c) {
-      return static_cast<unsigned char>(c) < 0x20 || c == '"' || c == '\\';
-    };
-    if (std::none_of(text.begin(), text.end(), needsEscape)) {
-      out_ += '"';
-      out_ += text;
-      out_ += '"';
-    } else {
-      appendCompactJson(out_, Value(key));
-    }
-    out_ += ": ";
-  }
-
-  // `writeElements` calls its argument with a function for each element, which writes it and returns whether
-  // it could. After a failure the rest is not written.
-  template <typename WriteElements>
-  bool writeList(char open, char close, bool isEmpty, WriteElements writeElements) {
-    out_ += open;
-    indentation_ += 2;
-    bool isFirst = true;
-    bool isWritten = true;
-    writeElements([&](auto&& writeElement) {
-      if (!isWritten) return;
-      if (!std::exchange(isFirst, false)) out_ += ',';
-      startLine();
-      isWritten = writeElement();
-    });
-    if (!isWritten) return false;
-    indentation_ -= 2;
-    if (!isEmpty) startLine();
-    out_ += close;
-    return true;
-  }
-
-  void startLine() {
-    out_ += '\n';
-    out_.append(indentation_, ' ');
-  }
-
-  // Prepends `part` to the path of the value that JSON cannot express. Always returns false.
-  bool isWithin(const std::string& part) {
-    const bool needsDot = !place_.empty() && place_.front() != '[';
-    place_ = part + (needsDot ? "." : "") + place_;
-    return false;
-  }
-
-  std::string& out_;
-  std::size_t indentation_ = 0;
-  std::string place_;          // path such as "a.b[2]"
-  std::string inexpressible_;  // the value: "nan" or an infinity
 };
 
 std::optional<Value> valueOf(const Json& json, Path& path, std::string& problem);
@@ -226,10 +113,8 @@ std::string NlohmannJsonService::compact(const ValueMap& map) const { return map
 std::optional<std::string> NlohmannJsonService::pretty(const ValueMap& map, std::string& problem) const {
   std::string text;
   text.reserve(map.bytes() + map.bytes() / 4);  // mostly enough
-  PrettyWriter writer(text);
-  if (writer.write(map)) return text;
-  problem = writer.problem();
-  return std::nullopt;
+  if (!appendPrettyJson(text, map, problem)) return std::nullopt;
+  return text;
 }
 
 std::optional<Value> NlohmannJsonService::parse(std::string_view text, std::string& problem) const {

@@ -5,7 +5,7 @@
 
 namespace tonewerk {
 
-// Writes JSON with the values' own compact writer and reads it with a JSON library. Pretty text is indented
+// Writes JSON with the values' own writers and reads it with a JSON library. Pretty text is indented
 // by two spaces and has no newline at the end. A double always has a fraction or an exponent (2.0). An
 // integer beyond 64 bits is read as a double. If an object has a key twice, the last one counts. Values
 // nested deeper than 200 levels are refused.

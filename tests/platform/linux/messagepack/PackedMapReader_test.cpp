@@ -18,6 +18,7 @@
 #include "platform/linux/otlp/OtlpLogRecord.h"
 #include "platform/linux/protobuf/Hex.h"
 #include "values/Nesting.h"
+#include "values/PrettyJson.h"
 #include "values/ValueDigest.h"
 #include "values/ValueView.h"
 
@@ -109,10 +110,21 @@ void expectSameEntries(const ValueMap& packed, const ValueMap& plain) {
   EXPECT_EQ(packed.text("absent"), "");
 }
 
+void expectSamePrettyText(const ValueMap& packed, const ValueMap& plain) {
+  std::string text;
+  std::string problem;
+  std::string plainText;
+  std::string plainProblem;
+  EXPECT_EQ(appendPrettyJson(text, packed, problem), appendPrettyJson(plainText, plain, plainProblem));
+  EXPECT_EQ(text, plainText);
+  EXPECT_EQ(problem, plainProblem);
+}
+
 void expectSameMap(const ValueMap& packed, const ValueMap& plain) {
   EXPECT_EQ(packed, plain);
   EXPECT_EQ(plain, packed);
   EXPECT_EQ(packed.text(), plain.text());
+  expectSamePrettyText(packed, plain);
 }
 
 // The tree of `packed`: every function that needs one.
