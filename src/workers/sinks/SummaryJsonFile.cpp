@@ -1,22 +1,24 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "workers/sinks/SummaryJsonFile.h"
 
+#include <array>
 #include <cassert>
-#include <string_view>
-#include <system_error>
-#include <utility>
+#include <charconv>
+#include <limits>
 
 #include "platform/FileSystem.h"
-#include "platform/JsonService.h"
 #include "platform/Log.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingUtility.h"
+#include "values/PrettyJson.h"
 
 namespace tonewerk {
 namespace {
 
 constexpr unsigned kDirectoryMode = 0777;
 constexpr std::string_view kExtension = ".json";
+// The lines of many messages take one write, and such a block is written without a copy.
+constexpr std::size_t kBlockBytes = std::size_t{256} << 10;
 
 std::string numbered(const std::string& name, std::size_t number) {
   if (number == 1) return name;
@@ -80,21 +82,38 @@ void SummaryJsonFile::writeLine(std::string_view text) {
   }
 }
 
+void SummaryJsonFile::writeCollected() {
+  if (lines_.empty()) return;
+  writeLine(std::string_view(lines_).substr(0, lines_.size() - 1));
+  lines_.clear();
+}
+
 void SummaryJsonFile::writeMessage(AudioEventCategory category, AudioEventType type,
                                    const ValueMap& payload) {
   if (reportPath_.empty()) openFile();
-  const Kind& kind = kindOf(category, type);
-  const std::string member = kind.name + "_" + std::to_string(++*kind.count);
+  const std::string_view member = nextMember(kindOf(category, type));
+  const std::size_t before = lines_.size();
   std::string problem;
-  const auto text =
-      TWReportingContext::current().platform().json.pretty(ValueMap{{member, payload}}, problem);
-  if (!text) {
+  if (hasEntry_) lines_ += ",\n";
+  if (!appendPrettyJson(lines_, member, payload, problem)) {
+    lines_.resize(before);
+    writeCollected();  // because its failure is logged first
     errorLog(TWReportingSummaryLogCategory(), "dataWithJSONObject: %@", problem);
     writeLine("");  // in place of the entry; the array continues without it
     return;
   }
-  if (std::exchange(hasEntry_, true)) writeLine(",");
-  writeLine(*text);
+  hasEntry_ = true;
+  lines_ += '\n';
+  if (lines_.size() >= kBlockBytes) writeCollected();
+}
+
+std::string_view SummaryJsonFile::nextMember(const Kind& kind) {
+  std::array<char, std::numeric_limits<std::size_t>::digits10 + 1> digits;
+  char* const end = std::to_chars(digits.data(), digits.data() + digits.size(), ++*kind.count).ptr;
+  member_.assign(kind.name);
+  member_ += '_';
+  member_.append(digits.data(), end);
+  return member_;
 }
 
 const SummaryJsonFile::Kind& SummaryJsonFile::kindOf(AudioEventCategory category, AudioEventType type) {
@@ -108,6 +127,7 @@ const SummaryJsonFile::Kind& SummaryJsonFile::kindOf(AudioEventCategory category
 }
 
 void SummaryJsonFile::closeFile() {
+  writeCollected();
   writeLine("]");
   std::error_code error;
   if (reportFileHandle_ != nullptr) {

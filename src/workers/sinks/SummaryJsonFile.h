@@ -54,17 +54,22 @@ class SummaryJsonFile {
 
   void openFile();
   const Kind& kindOf(AudioEventCategory category, AudioEventType type);
+  // The name of the kind's next message, until the next call: "Volume_Summary_2".
+  std::string_view nextMember(const Kind& kind);
   // Calls `attempt` with one name after the other while it fails because the name is taken. Returns its last
   // error.
   [[nodiscard]] std::error_code withFreeName(
       const std::function<std::error_code(const std::string& name)>& attempt);
   void writeLine(std::string_view text);
+  void writeCollected();
 
   const std::string directory_;
   const std::string name_;
   std::size_t nameNumber_ = 1;
   std::string reportPath_;  // empty until the first message
   std::unique_ptr<NewFile> reportFileHandle_;
+  std::string lines_;  // whole lines of entries that are not written yet, with their ends
+  std::string member_;
   bool hasLoggedLine_ = false;  // that a line of this file could not be written
   bool hasEntry_ = false;       // whether an entry with a text was written
   std::map<std::string, std::size_t> counts_;

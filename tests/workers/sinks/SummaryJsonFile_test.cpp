@@ -98,6 +98,34 @@ TEST_F(SummaryJsonFileTest, OnlyTheFirstLineThatCannotBeWrittenIsLogged) {
                           StartsWith("SummaryJsonFileWorker failed to closed file.")));
 }
 
+// The lines of many messages are written at once.
+TEST_F(SummaryJsonFileTest, AFileOfManyBlocksHasEveryLineInOrder) {
+  std::vector<ValueMap> payloads;
+  std::string expected = "[\n";
+  std::string separator;
+  for (int made = 0; made < 3'000; ++made) {
+    const std::string name = "Setup_Start_" + std::to_string(made + 1);
+    payloads.push_back(made % 500 == 499 ? kUnsayable
+                                         : ValueMap{{"n", made}, {"text", std::string(300, 'x')}});
+    std::string problem;
+    const auto text = test.json.pretty(ValueMap{{name, payloads.back()}}, problem);
+    expected += text ? separator + *text + "\n" : "\n";
+    separator = ",\n";
+  }
+  EXPECT_GT(expected.size(), std::size_t{1} << 20U);
+  EXPECT_EQ(written(payloads), expected + "]\n");
+}
+
+TEST_F(SummaryJsonFileTest, ABlockThatCannotBeWrittenIsLoggedBeforeALaterProblem) {
+  SummaryJsonFile file(kDirectory, "a.json");
+  file.writeMessage(kCategorySetup, kTypeStart, kGood);
+  test.files.failWrite(2, std::errc::no_space_on_device);
+  file.writeMessage(kCategorySetup, kTypeStart, kUnsayable);
+  EXPECT_THAT(test.log.textsOf("twru", LogLevel::kError),
+              ElementsAre(StartsWith("SummaryJsonFileWorker failed to write line."),
+                          StartsWith("dataWithJSONObject: ")));
+}
+
 TEST_F(SummaryJsonFileTest, AFileThatIsNotClosedDoesNotAppear) {
   {
     SummaryJsonFile file(kDirectory, "a.json");
