@@ -22,19 +22,24 @@ struct Timed {
 }  // namespace
 
 std::vector<std::size_t> placesByTime(MessageRange messages) {
-  // Mostly the messages came in order.
-  double latest = -std::numeric_limits<double>::infinity();
-  const auto isLate = [&latest](const TWReportingSessionMessage* message) {
-    const double time = sortedTimeOf(*message);
-    if (time < latest) return true;
-    latest = time;
-    return false;
-  };
-  if (std::none_of(messages.begin(), messages.end(), isLate)) return {};
-
+  // Mostly the messages came in order. Then nothing is kept. From the first late message on, each time is read
+  // once, not at every comparison.
   std::vector<Timed> timed;
-  timed.reserve(messages.size());
-  for (const auto* message : messages) timed.push_back({sortedTimeOf(*message), timed.size()});
+  double latest = -std::numeric_limits<double>::infinity();
+  forEachMessage(messages, [&](std::size_t place, const TWReportingSessionMessage& message) {
+    const double time = sortedTimeOf(message);
+    if (timed.empty()) {
+      if (time >= latest) {
+        latest = time;
+        return;
+      }
+      timed.reserve(messages.size());
+      for (std::size_t earlier = 0; earlier < place; ++earlier)
+        timed.push_back({sortedTimeOf(*messages[earlier]), earlier});
+    }
+    timed.push_back({time, place});
+  });
+  if (timed.empty()) return {};
   std::stable_sort(timed.begin(), timed.end(),
                    [](const Timed& a, const Timed& b) { return a.time < b.time; });
   std::vector<std::size_t> places;

@@ -36,6 +36,9 @@ std::int32_t ValueView::integer32() const {
 
 double ValueView::number() const {
   if (value_ != nullptr || !encoded_) return numberOf(value_);
+  if (encoded_.isNumber()) {
+    return encoding::visitNumber(encoded_.begin(), [](auto number) { return static_cast<double>(number); });
+  }
   return encoded_.isText() ? numberOfText(encoded_.text()) : encoded_.scalar().number();
 }
 

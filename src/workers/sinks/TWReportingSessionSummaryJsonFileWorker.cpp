@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "platform/Clock.h"
+#include "session/ForEachMessage.h"
 #include "session/LocalTime.h"
 #include "session/MessageShapes.h"
 #include "session/SinkQueue.h"
@@ -13,6 +14,7 @@
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingUtility.h"
+#include "values/Prefetch.h"
 #include "workers/sinks/SummaryJsonFile.h"
 
 namespace tonewerk {
@@ -25,8 +27,21 @@ struct Entry {
 };
 
 // Made once, so that a message gets one without an allocation.
-const Value kYes("YES");
-const Value kNo("NO");
+const ValueMapEntry kStarted{TWReportingMessageKeyIsSessionStarted, "YES"};
+const ValueMapEntry kNotStarted{TWReportingMessageKeyIsSessionStarted, "NO"};
+
+// Frees each payload while its bytes are in the processor's caches, and asks for later ones meanwhile.
+void writeFile(SummaryJsonFile& file, std::vector<Entry>& entries) {
+  constexpr std::size_t kAhead = 8;
+  constexpr std::size_t kPayloadBytes = 192;
+  for (std::size_t at = 0; at < entries.size(); ++at) {
+    if (at + kAhead < entries.size()) prefetch(entries[at + kAhead].payload, kPayloadBytes);
+    Entry& entry = entries[at];
+    file.writeMessage(entry.category, entry.type, entry.payload);
+    entry.payload = ValueMap();
+  }
+  file.closeFile();
+}
 
 }  // namespace
 
@@ -62,20 +77,15 @@ void TWReportingSessionSummaryJsonFileWorker::stop() {
   std::vector<Entry> entries;
   entries.reserve(owner->messages().size());
   std::size_t bytes = 0;
-  for (const auto& message : owner->messages()) {
-    if (message->isRedundant) continue;
-    setForAll(message->message,
-              {TWReportingMessageKeyIsSessionStarted, message->isSessionStarted ? kYes : kNo},
-              owner->shapes());
-    bytes += sizeof(Entry) + message->message.bytes();
-    entries.push_back({message->category, message->type, message->message});
-  }
+  forEachMessage(owner->messages(), [&](std::size_t, TWReportingSessionMessage& message) {
+    if (message.isRedundant) return;
+    setForAll(message.message, message.isSessionStarted ? kStarted : kNotStarted, owner->shapes());
+    bytes += sizeof(Entry) + message.message.bytes();
+    entries.push_back({message.category, message.type, message.message});
+  });
   TWReportingContext::current().fileSinkQueue().submit(
       bytes, [file = std::make_unique<SummaryJsonFile>(TWReportingLogsDirectory(), fileNameFor(*owner)),
-              entries = std::move(entries)] {
-        for (const Entry& entry : entries) file->writeMessage(entry.category, entry.type, entry.payload);
-        file->closeFile();
-      });
+              entries = std::move(entries)]() mutable { writeFile(*file, entries); });
 }
 
 }  // namespace tonewerk
