@@ -5,6 +5,8 @@
 #include <cmath>
 #include <limits>
 
+#include "session/ForEachMessage.h"
+
 namespace tonewerk {
 namespace {
 

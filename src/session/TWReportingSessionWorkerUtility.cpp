@@ -3,6 +3,8 @@
 
 #include <algorithm>
 
+#include "session/ForEachMessage.h"
+#include "session/KeySlots.h"
 #include "values/ValueView.h"
 
 namespace tonewerk {
@@ -12,12 +14,13 @@ std::vector<std::size_t> TWReportingSessionWorkerUtility::mergeRapidMessages(
   std::vector<std::size_t> merged;
   std::vector<std::string_view> seen;
   TWReportingSessionMessage* anchor = nullptr;
-  for (std::size_t place = 0; place < messages.size(); ++place) {
-    TWReportingSessionMessage& message = *messages[place];
+  KeySlots slots(keysToCombine);
+  forEachMessage(messages, [&](std::size_t place, TWReportingSessionMessage& message) {
+    if (!slots.mayHaveAny(message.message)) return;
     const auto key =
         std::find_if(keysToCombine.begin(), keysToCombine.end(),
                      [&](std::string_view candidate) { return message.message.contains(candidate); });
-    if (key == keysToCombine.end()) continue;
+    if (key == keysToCombine.end()) return;
     if (std::find(seen.begin(), seen.end(), *key) != seen.end()) {
       seen.clear();
       anchor = nullptr;
@@ -25,14 +28,14 @@ std::vector<std::size_t> TWReportingSessionWorkerUtility::mergeRapidMessages(
     seen.push_back(*key);
     if (anchor == nullptr) {
       anchor = &message;
-      continue;
+      return;
     }
     // Each merge updates the anchor's time. A pause that is not a number does not count as short.
     if (message.epochTime() - anchor->epochTime() < maximumPausetime) {
       anchor->message.merge(message.message);
       merged.push_back(place);
     }
-  }
+  });
   return merged;
 }
 

@@ -4,6 +4,7 @@
 #include <memory>
 #include <utility>
 
+#include "session/ForEachMessage.h"
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingUtility.h"
 
@@ -35,7 +36,7 @@ const Value IntervalWalk::kMinusOne(-1);
 ValueView IntervalWalk::Latest::find() {
   if (!hasBegun_) {
     hasBegun_ = true;
-    value_ = walk_.previousValues_.view(key_);
+    value_ = walk_.previousValues_.view(name_);
     if (!value_) value_ = ValueView(initial_);
   }
   const std::size_t current = walk_.walked_.size() - 1;
@@ -55,7 +56,7 @@ ValueView IntervalWalk::Latest::now() { return in(walk_.walked_.size() - 1); }
 ValueView IntervalWalk::Latest::in(std::size_t place) {
   if (lookedUp_ != place + 1) {
     lookedUp_ = place + 1;
-    found_ = walk_.walked_[place]->view(key_);
+    found_ = walk_.keys_.view(*walk_.walked_[place], key_);
   }
   return found_;
 }
@@ -89,6 +90,8 @@ IntervalWalk::IntervalWalk(const Kind& kind, const LogSite& site, double minimum
       site_(site),
       minimumSeconds_(minimumSeconds),
       previousValues_(std::move(previousValues)),
+      runningKey_(keys_.add(kind.runningKey)),
+      durationKey_(keys_.add(TWReportingMessageKeySessionDuration)),
       wasRunning_(previousValues_.boolean(kind.runningKey)) {
   if (!wasRunning_) return;
   switch (kind_.openInterval) {
@@ -107,16 +110,16 @@ IntervalWalk::IntervalWalk(const Kind& kind, const LogSite& site, double minimum
 
 TWReportingSessionMessages IntervalWalk::summariesOf(MessageRange messages,
                                                      std::span<const std::size_t> leftOut) {
-  walked_.reserve(messages.size() - leftOut.size());
   auto nextLeftOut = leftOut.begin();
-  for (std::size_t place = 0; place < messages.size(); ++place) {
+  forEachMessage(messages, [&](std::size_t place, const TWReportingSessionMessage& record) {
     if (nextLeftOut != leftOut.end() && *nextLeftOut == place) {
       ++nextLeftOut;
-      continue;
+      return;
     }
-    walked_.push_back(&messages[place]->message);
+    if (!keys_.mayHaveAny(record.message)) return;
+    walked_.push_back(&record.message);
     step();
-  }
+  });
   for (const auto& summary : summaries_) {
     summary->message.set(TWReportingMessageKeyMessageCount, summaries_.size());
   }
@@ -124,10 +127,10 @@ TWReportingSessionMessages IntervalWalk::summariesOf(MessageRange messages,
 }
 
 void IntervalWalk::step() {
-  running_ = message().view(kind_.runningKey);
+  running_ = keys_.view(message(), runningKey_);
   if (!wasRunning_ && !running_) return;
   const bool saysOn = running_.boolean();
-  const bool isLast = message().contains(TWReportingMessageKeySessionDuration);
+  const bool isLast = static_cast<bool>(keys_.view(message(), durationKey_));
   bool ends = isLast;
   if (running_) {
     isRunning_ = saysOn;

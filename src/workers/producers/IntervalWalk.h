@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "platform/Log.h"
+#include "session/KeySlots.h"
 #include "session/MessageRange.h"
 #include "session/TWReportingSessionMessage.h"
 #include "values/Value.h"
@@ -28,8 +29,8 @@ namespace tonewerk {
 // a summary holds. An object walks once, on the work queue.
 //
 // Sessions store many messages, and few of them end an interval. So the walk does not collect what every
-// message says. It reads a few keys of each message, and searches the earlier messages for the other values
-// that it needs (see Latest).
+// message says. It passes over messages that have none of its keys. It reads a few keys of the others, and
+// searches the earlier messages for the other values that it needs (see Latest).
 class IntervalWalk {
  public:
   // What happens to an interval that the previous values show as running.
@@ -83,9 +84,9 @@ class IntervalWalk {
   class Latest {
    public:
     // `initial` is the value when neither the messages nor the previous values have the key. It outlives the
-    // walk; null for none.
-    Latest(const IntervalWalk& walk, std::string_view key, const Value* initial = nullptr)
-        : walk_(walk), key_(key), initial_(initial) {}
+    // walk; null for none. Made with the walk, which from then on looks at the messages that have the key.
+    Latest(IntervalWalk& walk, std::string_view key, const Value* initial = nullptr)
+        : walk_(walk), name_(key), key_(walk.keys_.add(key)), initial_(initial) {}
     Latest(const Latest&) = delete;
     Latest& operator=(const Latest&) = delete;
 
@@ -104,8 +105,9 @@ class IntervalWalk {
    private:
     ValueView in(std::size_t place);
 
-    const IntervalWalk& walk_;
-    const std::string_view key_;
+    IntervalWalk& walk_;
+    const std::string_view name_;
+    const std::size_t key_;  // its index in the walk's keys
     const Value* const initial_;
     ValueView value_;  // the latest one in the first searched_ messages
     std::size_t searched_ = 0;
@@ -139,7 +141,11 @@ class IntervalWalk {
   const LogSite site_;
   const double minimumSeconds_;
   const ValueMap previousValues_;
-  std::vector<const ValueMap*> walked_;  // up to the message that is being looked at
+  // Has every key that a message must have to make the walk do anything.
+  KeySlots keys_;
+  const std::size_t runningKey_;
+  const std::size_t durationKey_;
+  std::vector<const ValueMap*> walked_;  // those with a key, up to the message that is being looked at
   ValueView running_;                    // what this message says
   bool wasRunning_ = false;              // what the latest message before it says that says something
   bool isRunning_ = false;
