@@ -2,10 +2,17 @@
 #include "workers/sinks/RtcSummary.h"
 
 #include <algorithm>
+#include <array>
+#include <charconv>
+#include <concepts>
+#include <cstddef>
+#include <limits>
 #include <string>
 #include <unordered_map>
+#include <utility>
 #include <vector>
 
+#include "session/ForEachMessage.h"
 #include "values/ValueView.h"
 
 namespace tonewerk {
@@ -17,16 +24,15 @@ class JoinedTexts {
   void add(const SharedString& key, ValueView value) {
     const std::size_t place = placeOf(key);
     guess_ = place + 1;
-    if (place == texts_.size()) {
-      texts_.push_back({key, value.text()});
-      return;
-    }
-    std::string& text = texts_[place].text;
-    text += ',';
-    if (const auto same = value.asText()) {
-      text += *same;
+    append(texts_[place], value);
+  }
+
+  void add(const ValueMap& message) {
+    if (const PackedMap* map = message.packed()) {
+      const std::vector<std::size_t>& places = placesOf(map->shape());
+      map->forEach([&](std::size_t slot, EncodedValue value) { append(texts_[places[slot]], value); });
     } else {
-      text += value.text();
+      message.forEach([this](const SharedString& key, ValueView value) { add(key, value); });
     }
   }
 
@@ -41,19 +47,57 @@ class JoinedTexts {
   struct Text {
     SharedString key;
     std::string text;
+    bool isEmpty = true;  // without a value; a value's text may be empty
   };
   struct KeyHash {
     std::size_t operator()(const SharedString& key) const { return key.hash(); }
   };
-  // The number of texts when the key is new.
+
+  static void append(Text& joined, ValueView value) {
+    std::string& text = joined.text;
+    if (!std::exchange(joined.isEmpty, false)) text += ',';
+    const EncodedValue encoded = value.encoded();
+    if (encoded && encoded.isNumber()) {
+      encoding::visitNumber(encoded.begin(), [&text](auto number) { append(text, number); });
+    } else if (const auto same = value.asText()) {
+      text += *same;
+    } else {
+      text += value.text();
+    }
+  }
+  static void append(std::string& text, bool value) { text += value ? '1' : '0'; }
+  static void append(std::string& text, double value) { text += textOf(value); }
+  template <std::integral Integer>
+  static void append(std::string& text, Integer value) {
+    std::array<char, std::numeric_limits<Integer>::digits10 + 2> digits;
+    text.append(digits.data(), std::to_chars(digits.data(), digits.data() + digits.size(), value).ptr);
+  }
+
+  // Adds a text without a value for a key that is new.
   std::size_t placeOf(const SharedString& key) {
     if (guess_ < texts_.size() && texts_[guess_].key.sharesStorageWith(key)) return guess_;
-    return places_.try_emplace(key, texts_.size()).first->second;
+    const auto [place, isNew] = places_.try_emplace(key, texts_.size());
+    if (isNew) texts_.push_back({key, {}});
+    return place->second;
+  }
+
+  // The place of each slot's key.
+  const std::vector<std::size_t>& placesOf(const Shape& shape) {
+    std::vector<std::size_t>& places = shapes_[&shape];
+    if (places.empty()) {
+      for (std::size_t slot = 0; slot < shape.size(); ++slot) {
+        places.push_back(placeOf(shape.key(slot)));
+        guess_ = places.back() + 1;
+      }
+    }
+    return places;
   }
 
   std::vector<Text> texts_;
   std::size_t guess_ = 0;  // messages of one kind mostly have their keys in the same order
   std::unordered_map<SharedString, std::size_t, KeyHash> places_;
+  // Nobody changes the messages meanwhile, so the shapes live on.
+  std::unordered_map<const Shape*, std::vector<std::size_t>> shapes_;
 };
 
 bool isMeantFor(const TWReportingSessionWorkerClass& workerClass, const TWReportingSessionMessage& message) {
@@ -67,11 +111,10 @@ ValueMap rtcSummaryOf(const TWReportingSessionMessages& messages, AudioServiceTy
                       const TWReportingSessionWorkerClass& workerClass) {
   JoinedTexts summary;
   summary.add("TW_Session_Summary_Event", Value(serviceType));
-  for (const auto& message : messages) {
-    if (message->isRedundant || !message->isSessionStarted || !isMeantFor(workerClass, *message)) continue;
-    message->message.forEach(
-        [&summary](const SharedString& key, ValueView value) { summary.add(key, value); });
-  }
+  forEachMessage(messages, [&](std::size_t, const TWReportingSessionMessage& message) {
+    if (message.isRedundant || !message.isSessionStarted || !isMeantFor(workerClass, message)) return;
+    summary.add(message.message);
+  });
   return summary.map();
 }
 
