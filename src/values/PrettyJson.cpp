@@ -46,7 +46,8 @@ class PrettyWriter {
     if (!isEmpty) startLine(true);
     out_.add(bracket);
   }
-  void startLine(bool isFirst) { out_.add(std::string_view(line_).substr(isFirst ? 1 : 0)); }
+  std::string_view line(bool isFirst) const { return std::string_view(line_).substr(isFirst ? 1 : 0); }
+  void startLine(bool isFirst) { out_.add(line(isFirst)); }
   void key(std::string_view key) {
     out_.text(key);
     out_.add(": ");
@@ -92,9 +93,7 @@ bool PrettyWriter::packed(const PackedMap& map) {
   bool isWritten = true;
   map.forEach([&](std::size_t slot, EncodedValue held) {
     if (!isWritten) return;
-    startLine(slot == 0);
-    out_.add(map.shape().json(slot).substr(1));  // without the comma
-    out_.add(' ');
+    out_.add(line(slot == 0), map.shape().json(slot).substr(1), ' ');  // the key without its comma
     isWritten = value(held) || isWithin(map.shape().key(slot));
   });
   if (isWritten) close('}', map.size() == 0);
