@@ -8,7 +8,7 @@
 namespace tonewerk {
 namespace {
 
-// What the heap adds to a block.
+// What the heap adds to a block; more than what a map leaves unused in a chunk.
 constexpr std::size_t kHeapBytes = 16;
 
 std::size_t rounded(std::size_t bytes) {

@@ -20,8 +20,9 @@ class KeptPayloads {
  public:
   // The first region is one chunk, so that a session with few messages takes little.
   static constexpr std::size_t kMaxRegionBytes = 16 * PackedChunk::kBytes;
-  // A larger map would leave too much of a chunk unused.
-  static constexpr std::size_t kMaxMapBytes = PackedChunk::kBytes / 16;
+  // At least 67 maps of this size lie in a chunk. So what they leave unused at its end is no more than the
+  // 16 bytes for each that bytesOf() counts for the heap.
+  static constexpr std::size_t kMaxMapBytes = 960;
 
   KeptPayloads();
   KeptPayloads(const KeptPayloads&) = delete;

@@ -2,8 +2,10 @@
 #include "session/KeptPayloads.h"
 
 #include <cstddef>
+#include <cstdint>
 #include <gtest/gtest.h>
 #include <rapidcheck/gtest.h>
+#include <set>
 #include <string>
 #include <thread>
 #include <utility>
@@ -58,6 +60,21 @@ TEST_F(KeptPayloadsTest, CountsNoLessThanAMapTakes) {
   EXPECT_GE(KeptPayloads::bytesOf(first), static_cast<std::size_t>(distance));
 }
 
+TEST_F(KeptPayloadsTest, CountsTheUnusedEndsOfChunks) {
+  for (const std::size_t text : {std::size_t{40}, std::size_t{500}, KeptPayloads::kMaxMapBytes - 20}) {
+    std::vector<ValueMap> kept;
+    std::set<std::uintptr_t> chunks;
+    std::size_t counted = 0;
+    for (int number = 0; number < 5'000; ++number) {
+      kept.push_back(payloads.keep(payload(100 + number % 20, text)));
+      counted += KeptPayloads::bytesOf(kept.back());
+      chunks.insert(reinterpret_cast<std::uintptr_t>(kept.back().packed()) / PackedChunk::kBytes);
+    }
+    EXPECT_FALSE(payloads.keep(kept.front()).sharesStorageWith(kept.front()));
+    EXPECT_GE(counted, (chunks.size() - 2) * PackedChunk::kBytes) << text;
+  }
+}
+
 TEST_F(KeptPayloadsTest, AMapOutlivesItsMaker) {
   ValueMap kept;
   {
@@ -88,7 +105,7 @@ TEST_F(KeptPayloadsTest, MapsEndOnAnyThread) {
 }
 
 RC_GTEST_FIXTURE_PROP(KeptPayloadsTest, KeepsWhatItWasGiven, ()) {
-  const auto sizes = *rc::gen::container<std::vector<std::size_t>>(rc::gen::inRange<std::size_t>(0, 6'000));
+  const auto sizes = *rc::gen::container<std::vector<std::size_t>>(rc::gen::inRange<std::size_t>(0, 1'500));
   std::vector<ValueMap> given;
   std::vector<ValueMap> kept;
   for (const std::size_t size : sizes) {
