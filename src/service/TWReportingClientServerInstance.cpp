@@ -183,10 +183,9 @@ void TWReportingClientServerInstance::deliver(TWReportingServiceDelegateProtocol
     return reply(ReplyError{std::string(kReportingErrorDomain), kReportingDisabled, ""});
   }
   const auto send = [&](const Session& session, ValueMap payload) {
-    const auto record =
-        std::make_shared<TWReportingSessionMessage>(std::move(payload), messageCategory, type);
+    TWReportingSessionMessage record(std::move(payload), messageCategory, type);
     session->sendMessage(record);
-    delegate.messageTap().note(*session, *record);
+    delegate.messageTap().note(*session, record);
   };
   if (reporterIDs && reporterIDs->size() == 1) {  // nearly always; without a list of sessions
     const ReporterID only = reporterIDs->front();

@@ -252,30 +252,29 @@ void TWReportingSession::forEachWorker(Order order, Visitor visit) {
   }
 }
 
-void TWReportingSession::sendMessage(const std::shared_ptr<TWReportingSessionMessage>& message,
-                                     const MessageReply& reply) {
+void TWReportingSession::sendMessage(TWReportingSessionMessage& message, const MessageReply& reply) {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   ++totalMessageCount_;
-  if (!completePacked(*message)) {
-    addMissingDates(*message);
-    removeWhiteSpaceFromKeys(*message);
-    addAudioMessageTag(*message);
-    addAppName(*message);
+  if (!completePacked(message)) {
+    addMissingDates(message);
+    removeWhiteSpaceFromKeys(message);
+    addAudioMessageTag(message);
+    addAppName(message);
   }
   emitTracePoint(TWReportingTracePoint::kMessageReceived);
-  message->isSessionStarted = started_;
-  message->isRedundant = messageIsRedundant(*message);
-  if (message->isRedundant) ++redundantMessageCount_;
+  message.isSessionStarted = started_;
+  message.isRedundant = messageIsRedundant(message);
+  if (message.isRedundant) ++redundantMessageCount_;
   debugLog(TWReportingSessionCategory(),
            "TWReportingSessionWorker action=sendMessage reporterID=%lli app=%@ redundant=%@ message=%@",
-           reporterID_, applicationName_, yesOrNo(message->isRedundant), *message);
-  addPreviousValues(message->message);
-  const TWReportingSessionMessage* stored = message->isRedundant ? nullptr : store(*message);
-  if (!message->isRedundant && stored == nullptr) ++unkeptMessageCount_;
+           reporterID_, applicationName_, yesOrNo(message.isRedundant), message);
+  addPreviousValues(message.message);
+  const TWReportingSessionMessage* stored = message.isRedundant ? nullptr : store(message);
+  if (!message.isRedundant && stored == nullptr) ++unkeptMessageCount_;
   // A worker that keeps the payload shares that of the stored message, which takes memory anyway. A copy,
   // because a worker may stop the session.
   if (stored == nullptr) {
-    deliver(*message);
+    deliver(message);
   } else {
     deliver(TWReportingSessionMessage(*stored));
   }

@@ -77,8 +77,11 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   using MessageReply = std::function<void(const std::optional<ReplyError>& error)>;
   // Normalises the message, decides whether it is redundant, stores a copy and delivers it, then replies
   // without an error.
+  void sendMessage(TWReportingSessionMessage& message, const MessageReply& reply = nullptr);
   void sendMessage(const std::shared_ptr<TWReportingSessionMessage>& message,
-                   const MessageReply& reply = nullptr);
+                   const MessageReply& reply = nullptr) {
+    sendMessage(*message, reply);
+  }
 
   // The steps that normalise a message, in this order.
   static void addMissingDates(TWReportingSessionMessage& message);
