@@ -114,6 +114,7 @@ void RtcReporter::takeBackends(std::uint64_t run, const LinkReportSession::Backe
   if (run != run_ || linkReportSession_ == nullptr) return;
   hasAnswer_ = true;
   linkReportSessionStarted_ = backends.has_value();
+  silentSince_.store(backends ? 0 : run, std::memory_order_release);
   if (backends) {
     defaultLog(TWReportingSessionLinkReportCategory(), "list of backends %@", *backends);
   } else {

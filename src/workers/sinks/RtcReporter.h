@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <atomic>
 #include <chrono>
 #include <cstdint>
 #include <memory>
@@ -40,6 +41,12 @@ class RtcReporter : public std::enable_shared_from_this<RtcReporter> {
   explicit RtcReporter(std::shared_ptr<Strand> queue);
   ~RtcReporter();
 
+  // Whether the start with this number, counted from 1, has been answered without backends: then neither
+  // messages nor a summary are sent until the next one. Any thread.
+  bool isSilentSince(std::uint64_t start) const {
+    return silentSince_.load(std::memory_order_acquire) == start;
+  }
+
   // All of these are called on the queue.
   void start(const Start& start);
   void handleMessage(const TWReportingSessionMessage& message);
@@ -63,6 +70,7 @@ class RtcReporter : public std::enable_shared_from_this<RtcReporter> {
   std::unique_ptr<LinkReportSession> linkReportSession_;
   std::optional<std::string> linkReportAgentToken_;
   std::uint64_t run_ = 0;  // the number of starts; an answer to an earlier start is ignored
+  std::atomic<std::uint64_t> silentSince_ = 0;  // the start that found no backends; 0 for none
   bool hasAnswer_ = false;
   std::unique_ptr<Timer> timeout_;  // last, because its tick refers to this
 };

@@ -50,6 +50,7 @@ std::optional<bool> TWReportingSessionRtcWorker::start() {
   start.reporterID = owner->reporterID();
   start.isSingleMessageSession = owner->isSingleMessageSession();
   makeQueueOnFirstUse();
+  ++starts_;
   const std::size_t bytes = sizeof(start) + start.configuration.bytes();
   linkReportQueue_->submit(bytes, [reporter = reporter_, held = std::move(start)] { reporter->start(held); });
   return true;
@@ -71,6 +72,8 @@ void TWReportingSessionRtcWorker::stop() {
   const auto owner = session.lock();
   if (owner == nullptr) return;
   makeQueueOnFirstUse();
+  // Without backends there is no summary, and so nothing to copy.
+  if (reporter_->isSilentSince(starts_) && linkReportQueue_->runAtOnce([&] { reporter_->stop(); })) return;
   TWReportingSessionMessages copies;
   copies.reserve(owner->messages().size());
   std::size_t bytes = 0;

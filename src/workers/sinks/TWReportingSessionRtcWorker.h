@@ -46,6 +46,7 @@ class TWReportingSessionRtcWorker final : public TWReportingSessionWorkerConsume
 
   std::shared_ptr<Strand> linkReportQueue_;
   std::shared_ptr<RtcReporter> reporter_;  // the queue's work shares it
+  std::uint64_t starts_ = 0;               // how many the reporter has been given
 };
 
 }  // namespace tonewerk

@@ -114,6 +114,29 @@ TEST_F(TWReportingSessionRtcWorkerTest, MessagesStayInOrderBehindTheStart) {
   EXPECT_EQ(service(1).messages[0].payload.integer("a"), 2);
 }
 
+TEST_F(TWReportingSessionRtcWorkerTest, AStopWithoutBackendsOnlyLogs) {
+  test.linkReport.answerAtOnce(std::nullopt);
+  startAndRun();
+  send({{"a", 1}});
+  session->stop();
+  EXPECT_THAT(defaults(), ElementsAre("Session never started. handleMessage", "Session never started. stop"));
+  run();
+  EXPECT_THAT(defaults(), SizeIs(2));
+  EXPECT_THAT(service(0).messages, IsEmpty());
+}
+
+TEST_F(TWReportingSessionRtcWorkerTest, AStartWithBackendsAfterOneWithoutSendsItsSummary) {
+  test.linkReport.answerAtOnce(std::nullopt);
+  startAndRun();
+  session->stop();
+  test.linkReport.answerAtOnce(std::vector<std::string>{"memory"});
+  session->start();
+  send({{"a", 1}});
+  EXPECT_EQ(stopAndTakeSummary().size(), 0U);  // of the first one
+  ASSERT_THAT(service(1).messages, SizeIs(2));
+  EXPECT_EQ(service(1).messages[1].payload.text("a"), "1");
+}
+
 TEST_F(TWReportingSessionRtcWorkerTest, ThousandsOfSessionsShareOneQueuesThread) {
   std::vector<std::shared_ptr<TWReportingSession>> sessions;
   for (ReporterID id = 100; id < 200; ++id) {
