@@ -24,6 +24,41 @@ TEST(LogTest, ShowsEveryKindOfTextUnchanged) {
   EXPECT_THAT(log.textsOf("twrs"), ElementsAre("a b c d e"));
 }
 
+// A log whose thresholds never change, and which counts how often it is asked for a line.
+class FixedLog final : public Log {
+ public:
+  bool isEnabled(std::string_view /*category*/, LogLevel /*level*/) const override {
+    return ++questions_ > 0;
+  }
+  std::optional<LogLevel> fixedThreshold(std::string_view category) const override {
+    return category == "twrs" ? LogLevel::kInfo : LogLevel::kError;
+  }
+  void write(std::string_view /*subsystem*/, std::string_view category, LogLevel level,
+             std::string_view /*message*/) override {
+    written_ += std::string(category) + " " + std::string(textOf(level)) + ";";
+  }
+  const std::string& written() const { return written_; }
+  int questions() const { return questions_; }
+
+ private:
+  mutable int questions_ = 0;
+  std::string written_;
+};
+
+TEST(LogTest, AFixedThresholdDecidesWithoutAskingForEachLine) {
+  FixedLog log;
+  const LogCategory service(log, "com.orvane.tonewerk", "twrs");
+  const LogCategory session(log, "com.orvane.tonewerk", "twrr");
+  for (const LogCategory* category : {&service, &session}) {
+    debugLog(category, "x");
+    infoLog(category, "x");
+    defaultLog(category, "x");
+    errorLog(category, "x");
+  }
+  EXPECT_EQ(log.written(), "twrs info;twrs default;twrs error;twrr error;");
+  EXPECT_EQ(log.questions(), 0);
+}
+
 TEST(LogTest, PrefixIsTheFilesBaseNameAndLine) {
   EXPECT_EQ(logPrefix("/a/b/TWReportingSession.cpp", 214), "       TWReportingSession:214   ");
   EXPECT_EQ(logPrefix("x.h", 1), "                        x:1     ");

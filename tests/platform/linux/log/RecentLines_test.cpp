@@ -5,6 +5,7 @@
 
 #include "platform/linux/diagnostics/collectors/LogTailCollector.h"
 #include "platform/linux/log/RememberingLog.h"
+#include "platform/linux/log/StreamLog.h"
 #include "support/manual/ManualClock.h"
 #include "support/memory/MemoryLog.h"
 
@@ -53,6 +54,13 @@ TEST(RememberingLogTest, MakesEveryLineValidUtf8) {
   EXPECT_TRUE(lines->text().ends_with("a tool said \uFFFD\n"));
 }
 
+TEST(RememberingLogTest, HasTheThresholdOfTheLogBelow) {
+  ManualClock clock;
+  const RememberingLog log(std::make_unique<StreamLog>(-1, clock, LogThreshold(LogLevel::kError)),
+                           std::make_shared<RecentLines>(), clock);
+  EXPECT_EQ(log.fixedThreshold("twrr"), LogLevel::kError);
+}
+
 TEST(RememberingLogTest, KeepsTheLinesThatItPassesOn) {
   ManualClock clock;
   auto inner = std::make_unique<MemoryLog>();
@@ -62,6 +70,7 @@ TEST(RememberingLogTest, KeepsTheLinesThatItPassesOn) {
   RememberingLog log(std::move(inner), lines, clock);
   EXPECT_FALSE(log.isEnabled("twrr", LogLevel::kDebug));
   EXPECT_TRUE(log.isEnabled("twrr", LogLevel::kInfo));
+  EXPECT_EQ(log.fixedThreshold("twrr"), std::nullopt);  // that of a MemoryLog may change
   log.write("com.orvane.tonewerk", "twrr", LogLevel::kInfo, "start called");
   ASSERT_EQ(written.lines().size(), 1u);
   EXPECT_EQ(written.lines().front(),
