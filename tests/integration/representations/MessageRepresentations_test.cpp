@@ -120,8 +120,10 @@ class MessageRepresentationsTest : public ReportingTest {
     faults.doubledKeys = maps.isOneIn(50);
     faults.otherOrder = maps.isOneIn(20);
     faults.otherNumbers = maps.isOneIn(5);
-    std::string frame = "\x93\x02\xABsendMessage\x91";
-    return frame + maps.bytesOf(payload, faults);
+    // All arguments, because other calls are not decoded into packed maps.
+    std::string frame = "\x93\x02\xABsendMessage\x94";
+    frame += maps.bytesOf(payload, faults);
+    return frame + "\x04\x01\xC0";  // a category, a type and no sessions
   }
 
   RandomMaps maps{kSeed};
