@@ -24,8 +24,8 @@ struct Timed {
 }  // namespace
 
 std::vector<std::size_t> placesByTime(MessageRange messages) {
-  // Mostly the messages came in order. Then nothing is kept. From the first late message on, each time is read
-  // once, not at every comparison.
+  // Mostly the messages came in order. Then nothing is kept. From the first late message on, each time is
+  // read once, not at every comparison.
   std::vector<Timed> timed;
   double latest = -std::numeric_limits<double>::infinity();
   forEachMessage(messages, [&](std::size_t place, const TWReportingSessionMessage& message) {
