@@ -14,6 +14,15 @@ TWReportingSessionMessage& KeptMessages::add(const TWReportingSessionMessage& me
   return added;
 }
 
+std::size_t KeptMessages::bytesFor(const TWReportingSessionMessage& message) const {
+  // Twice, because half of the last piece of records may be empty.
+  constexpr std::size_t kRecordBytes = 2 * sizeof(TWReportingSessionMessage);
+  constexpr std::size_t kListBytes = 128;  // of destination workers; only producers name them
+  return kRecordBytes + (message.destinationWorkers.empty() ? 0 : kListBytes) +
+         (size() < kFewMessages ? KeptPayloads::heapBytesOf(message.message)
+                                : payloads_.bytesFor(message.message));
+}
+
 bool KeptMessages::sortByTime() {
   const std::vector<std::size_t> places = placesByTime(*this);
   if (places.empty()) return false;

@@ -17,9 +17,9 @@ namespace tonewerk {
 // changed through it. Payloads that others share live on after clear(). One thread.
 class KeptMessages {
  public:
-  // So many payloads are shared with the message that was added, not copied to memory of their own: few
-  // messages would take less memory than a chunk.
-  static constexpr std::size_t kFewMessages = 64;
+  // So many payloads are shared with the message that was added, not copied to memory of their own: those of
+  // few messages take less memory than a chunk.
+  static constexpr std::size_t kFewMessages = 512;
 
   // Adds a copy of the message.
   TWReportingSessionMessage& add(const TWReportingSessionMessage& message);
@@ -29,10 +29,9 @@ class KeptMessages {
   // Frees all memory that nobody else holds.
   void clear();
 
-  // Returns an upper bound of the bytes that add() takes for the message.
-  static std::size_t bytesOf(const TWReportingSessionMessage& message) {
-    return sizeof(TWReportingSessionMessage) + KeptPayloads::bytesOf(message.message);
-  }
+  // Returns an upper bound of the bytes that add(message) takes: nothing for a payload in a chunk that is
+  // there, a whole region for one that opens it.
+  std::size_t bytesFor(const TWReportingSessionMessage& message) const;
 
   std::size_t size() const { return messages_.size(); }
   bool empty() const { return size() == 0; }

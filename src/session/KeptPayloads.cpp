@@ -8,8 +8,9 @@
 namespace tonewerk {
 namespace {
 
-// What the heap adds to a block; more than what a map leaves unused in a chunk.
+// What the heap and the map's own objects add to the bytes of a packed map, and of a tree.
 constexpr std::size_t kHeapBytes = 16;
+constexpr std::size_t kTreeHeapBytes = 160;
 
 std::size_t rounded(std::size_t bytes) {
   return (bytes + alignof(PackedMap) - 1) / alignof(PackedMap) * alignof(PackedMap);
@@ -72,7 +73,7 @@ KeptPayloads::~KeptPayloads() = default;
 
 ValueMap KeptPayloads::keep(const ValueMap& payload) {
   const PackedMap* map = payload.packed();
-  if (map == nullptr || map->bytes() > kMaxMapBytes) return payload;
+  if (!isKeptInChunk(map)) return payload;
   if (chunk_ == nullptr || !chunk_->hasRoomFor(map->bytes())) openChunk();
   return ValueMap(PackedMap::make(map->shape(), map->values(), chunk_));
 }
@@ -82,12 +83,31 @@ void KeptPayloads::clear() {
   chunk_ = nullptr;
 }
 
-std::size_t KeptPayloads::bytesOf(const ValueMap& payload) { return rounded(payload.bytes()) + kHeapBytes; }
+std::size_t KeptPayloads::bytesFor(const ValueMap& payload) const {
+  const PackedMap* map = payload.packed();
+  if (!isKeptInChunk(map)) return heapBytesOf(payload);
+  if ((chunk_ != nullptr && chunk_->hasRoomFor(map->bytes())) || !needsRegion()) return 0;
+  return nextRegionChunks() * PackedChunk::kBytes;
+}
+
+std::size_t KeptPayloads::heapBytesOf(const ValueMap& payload) {
+  return rounded(payload.bytes()) + (payload.packed() == nullptr ? kTreeHeapBytes : kHeapBytes);
+}
+
+bool KeptPayloads::isKeptInChunk(const PackedMap* map) {
+  return map != nullptr && map->bytes() <= kMaxMapBytes;
+}
+
+bool KeptPayloads::needsRegion() const { return !region_ || opened_ == region_->chunks(); }
+
+std::size_t KeptPayloads::nextRegionChunks() const {
+  constexpr std::size_t kMostChunks = kMaxRegionBytes / PackedChunk::kBytes;
+  return region_ ? std::min(2 * region_->chunks(), kMostChunks) : 1;
+}
 
 void KeptPayloads::openChunk() {
-  if (!region_ || opened_ == region_->chunks()) {
-    constexpr std::size_t kMostChunks = kMaxRegionBytes / PackedChunk::kBytes;
-    region_ = Region::make(region_ ? std::min(2 * region_->chunks(), kMostChunks) : 1);
+  if (needsRegion()) {
+    region_ = Region::make(nextRegionChunks());
     opened_ = 0;
   }
   chunk_ = new (region_->chunkAt(opened_)) Chunk(*region_);

@@ -20,8 +20,7 @@ class KeptPayloads {
  public:
   // The first region is one chunk, so that a session with few messages takes little.
   static constexpr std::size_t kMaxRegionBytes = 16 * PackedChunk::kBytes;
-  // At least 67 maps of this size lie in a chunk. So what they leave unused at its end is no more than the
-  // 16 bytes for each that bytesOf() counts for the heap.
+  // At least 67 maps of this size lie in a chunk, so that little of its end stays unused.
   static constexpr std::size_t kMaxMapBytes = 960;
 
   KeptPayloads();
@@ -35,13 +34,19 @@ class KeptPayloads {
   // Lets go of the last region.
   void clear();
 
-  // Returns an upper bound of the bytes that the map takes that keep() returns for `payload`.
-  static std::size_t bytesOf(const ValueMap& payload);
+  // Returns the bytes that keep(payload) takes: those of a region that it opens, or of a payload that stays
+  // where it is.
+  std::size_t bytesFor(const ValueMap& payload) const;
+  // Returns an upper bound of the bytes that a payload takes on the heap.
+  static std::size_t heapBytesOf(const ValueMap& payload);
 
  private:
   class Chunk;
   class Region;
 
+  static bool isKeptInChunk(const PackedMap* map);
+  bool needsRegion() const;
+  std::size_t nextRegionChunks() const;
   // Opens the next chunk, in a new region where the last one has no more.
   void openChunk();
 

@@ -345,7 +345,7 @@ std::shared_ptr<TWReportingSessionMessage> TWReportingSession::lifecycleMessage(
 
 const TWReportingSessionMessage* TWReportingSession::store(const TWReportingSessionMessage& message) {
   const auto [newest, isNewKind] = newest_.try_emplace({message.category, message.type});
-  const std::size_t bytes = KeptMessages::bytesOf(message) + (isNewKind ? kKindBytes : 0);
+  const std::size_t bytes = messages_.bytesFor(message) + (isNewKind ? kKindBytes : 0);
   if (!budget_->take(bytes)) {
     if (isNewKind) newest_.erase(newest);
     logFullBudgetOnce();

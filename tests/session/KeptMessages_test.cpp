@@ -61,6 +61,21 @@ TEST_F(KeptMessagesTest, SharesThePayloadsOfAFewMessagesOnly) {
   }
 }
 
+TEST_F(KeptMessagesTest, CountsWhatFewMessagesTakeOnTheHeapAndThenRegions) {
+  std::size_t counted = 0;
+  for (std::size_t count = 0; count < KeptMessages::kFewMessages; ++count) {
+    const TWReportingSessionMessage record(payload(1, 1), 4, 1);
+    EXPECT_GT(messages.bytesFor(record), sizeof(record) + record.message.bytes());
+    counted += messages.bytesFor(record);
+    messages.add(record);
+  }
+  const TWReportingSessionMessage record(payload(1, 1), 4, 1);
+  EXPECT_GT(messages.bytesFor(record), PackedChunk::kBytes);
+  EXPECT_LT(messages.bytesFor(record), 3 * counted);
+  messages.add(record);
+  EXPECT_LT(messages.bytesFor(record), record.message.bytes() + 2 * sizeof(record));
+}
+
 TEST_F(KeptMessagesTest, AMessageStaysWhereItIsAndMayBeChanged) {
   auto* first = &messages.add(TWReportingSessionMessage({{"a", 1}}, 4, 1));
   for (int number = 0; number < 1'000; ++number) {

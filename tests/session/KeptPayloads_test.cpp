@@ -52,27 +52,31 @@ TEST_F(KeptPayloadsTest, PutsOneMapBehindTheOther) {
   EXPECT_LT(distance, static_cast<std::ptrdiff_t>(first.bytes() + alignof(PackedMap)));
 }
 
-TEST_F(KeptPayloadsTest, CountsNoLessThanAMapTakes) {
-  const ValueMap first = payloads.keep(payload(1));
-  const ValueMap second = payloads.keep(payload(2));
-  const auto distance =
-      reinterpret_cast<const char*>(second.packed()) - reinterpret_cast<const char*>(first.packed());
-  EXPECT_GE(KeptPayloads::bytesOf(first), static_cast<std::size_t>(distance));
-}
-
-TEST_F(KeptPayloadsTest, CountsTheUnusedEndsOfChunks) {
+TEST_F(KeptPayloadsTest, CountsEveryRegionWhenItIsOpened) {
   for (const std::size_t text : {std::size_t{40}, std::size_t{500}, KeptPayloads::kMaxMapBytes - 20}) {
+    KeptPayloads own;
     std::vector<ValueMap> kept;
     std::set<std::uintptr_t> chunks;
     std::size_t counted = 0;
     for (int number = 0; number < 5'000; ++number) {
-      kept.push_back(payloads.keep(payload(100 + number % 20, text)));
-      counted += KeptPayloads::bytesOf(kept.back());
+      const ValueMap map = payload(100 + number % 20, text);
+      const std::size_t taken = own.bytesFor(map);
+      EXPECT_LE(taken, KeptPayloads::kMaxRegionBytes);
+      counted += taken;
+      kept.push_back(own.keep(map));
+      EXPECT_FALSE(kept.back().sharesStorageWith(map));
       chunks.insert(reinterpret_cast<std::uintptr_t>(kept.back().packed()) / PackedChunk::kBytes);
+      ASSERT_GE(counted, chunks.size() * PackedChunk::kBytes) << text;
     }
-    EXPECT_FALSE(payloads.keep(kept.front()).sharesStorageWith(kept.front()));
-    EXPECT_GE(counted, (chunks.size() - 2) * PackedChunk::kBytes) << text;
+    EXPECT_LE(counted, chunks.size() * PackedChunk::kBytes + KeptPayloads::kMaxRegionBytes) << text;
   }
+}
+
+TEST_F(KeptPayloadsTest, CountsAPayloadThatStaysWhereItIs) {
+  const ValueMap tree{{"a", 1}};
+  EXPECT_GT(payloads.bytesFor(tree), tree.bytes());
+  const ValueMap large = payload(1, KeptPayloads::kMaxMapBytes);
+  EXPECT_GT(payloads.bytesFor(large), large.bytes());
 }
 
 TEST_F(KeptPayloadsTest, AMapOutlivesItsMaker) {
