@@ -57,6 +57,10 @@ class LinkReportSession {
   // Sends the messages now instead of in a batch. Does not wait for it.
   virtual void flushMessages() = 0;
 
+  // Whether sending a message takes about as long as handing it to another thread. Asked after the backends
+  // have answered.
+  virtual bool isQuick() const = 0;
+
   // For the log.
   virtual std::string description() const = 0;
 };

@@ -64,8 +64,8 @@ class Strand : public std::enable_shared_from_this<Strand> {
   Strand& operator=(const Strand&) = delete;
   ~Strand();
 
-  // Queues `work`, which holds `bytes`. Any thread but the pool's own, while the pool lives. Pieces run in
-  // the order of their submission.
+  // Queues `work`, which holds `bytes`. Any thread but the pool's own, while the pool lives; only one when
+  // runAtOnce() is used, too. Pieces run in the order of their submission.
   void submit(std::size_t bytes, Task work);
 
   // Runs `work` on the calling thread when no piece waits before it. Returns false, without running it, when
@@ -82,9 +82,9 @@ class Strand : public std::enable_shared_from_this<Strand> {
     return true;
   }
 
-  // Runs `work` on the pool's thread between two pieces, even while the strand holds pieces back. From
-  // inside a piece it runs `work` before it returns. Any thread; never waits; does nothing once the pool is
-  // gone.
+  // Runs `work` between two pieces, even while the strand holds pieces back; on the pool's thread, or, from
+  // inside a piece, on that piece's thread before it returns. Any thread; never waits; does nothing once the
+  // pool is gone.
   void interrupt(Task work);
 
   // In a piece on the pool's thread. After hold() the pieces behind the running one wait for release(), which

@@ -115,6 +115,7 @@ void RtcReporter::takeBackends(std::uint64_t run, const LinkReportSession::Backe
   hasAnswer_ = true;
   linkReportSessionStarted_ = backends.has_value();
   silentSince_.store(backends ? 0 : run, std::memory_order_release);
+  isQuick_.store(!backends || linkReportSession_->isQuick(), std::memory_order_relaxed);
   if (backends) {
     defaultLog(TWReportingSessionLinkReportCategory(), "list of backends %@", *backends);
   } else {

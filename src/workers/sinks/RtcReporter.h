@@ -47,6 +47,9 @@ class RtcReporter : public std::enable_shared_from_this<RtcReporter> {
     return silentSince_.load(std::memory_order_acquire) == start;
   }
 
+  // Whether a message need not wait for the queue's thread. Any thread.
+  bool isQuick() const { return isQuick_.load(std::memory_order_relaxed); }
+
   // All of these are called on the queue.
   void start(const Start& start);
   void handleMessage(const TWReportingSessionMessage& message);
@@ -71,6 +74,7 @@ class RtcReporter : public std::enable_shared_from_this<RtcReporter> {
   std::optional<std::string> linkReportAgentToken_;
   std::uint64_t run_ = 0;  // the number of starts; an answer to an earlier start is ignored
   std::atomic<std::uint64_t> silentSince_ = 0;  // the start that found no backends; 0 for none
+  std::atomic<bool> isQuick_ = true;
   bool hasAnswer_ = false;
   std::unique_ptr<Timer> timeout_;  // last, because its tick refers to this
 };

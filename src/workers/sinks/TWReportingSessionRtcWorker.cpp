@@ -4,6 +4,7 @@
 #include <cassert>
 #include <utility>
 
+#include "platform/Log.h"
 #include "session/StrandPool.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingSession.h"
@@ -59,7 +60,9 @@ std::optional<bool> TWReportingSessionRtcWorker::start() {
 bool TWReportingSessionRtcWorker::handleMessage(const TWReportingSessionMessage& message) {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   makeQueueOnFirstUse();
-  if (linkReportQueue_->runAtOnce([&] { reporter_->handleMessage(message); })) return false;
+  if (reporter_->isQuick() && linkReportQueue_->runAtOnce([&] { reporter_->handleMessage(message); })) {
+    return false;
+  }
   auto record = std::make_unique<TWReportingSessionMessage>(message.message, message.category, message.type);
   const std::size_t bytes = sizeof(TWReportingSessionMessage) + record->message.bytes();
   linkReportQueue_->submit(
@@ -72,8 +75,10 @@ void TWReportingSessionRtcWorker::stop() {
   const auto owner = session.lock();
   if (owner == nullptr) return;
   makeQueueOnFirstUse();
-  // Without backends there is no summary, and so nothing to copy.
-  if (reporter_->isSilentSince(starts_) && linkReportQueue_->runAtOnce([&] { reporter_->stop(); })) return;
+  // Without backends there is no summary, and so nothing to copy; only a debug line says that a message is.
+  const bool needsCopies =
+      !reporter_->isSilentSince(starts_) || TWReportingSessionCategory()->isEnabled(LogLevel::kDebug);
+  if (!needsCopies && linkReportQueue_->runAtOnce([&] { reporter_->stop(); })) return;
   TWReportingSessionMessages copies;
   copies.reserve(owner->messages().size());
   std::size_t bytes = 0;

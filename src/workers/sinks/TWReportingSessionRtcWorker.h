@@ -17,8 +17,8 @@ class RtcReporter;
 //
 // The service is used on a strand of the shared StrandPool. Its first piece waits up to nine seconds for the
 // service's backends, and messages and the stop wait behind it. A message that nothing is ahead of has its
-// turn on the strand at once, on the work queue's thread: handing it to the other thread would cost several
-// times more than the service does, which only queues it.
+// turn on the strand at once, on the work queue's thread, when the service only hands it to the store:
+// changing threads would cost more than that. Messages for a network go to the other thread.
 // `started` belongs to the session; the backends' answer does not change it.
 class TWReportingSessionRtcWorker final : public TWReportingSessionWorkerConsumerProtocol {
  public:

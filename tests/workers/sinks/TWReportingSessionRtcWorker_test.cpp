@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "workers/sinks/TWReportingSessionRtcWorker.h"
 
+#include <algorithm>
 #include <gtest/gtest.h>
 #include <thread>
 
@@ -101,6 +102,15 @@ TEST_F(TWReportingSessionRtcWorkerTest, AMessageThatNothingIsAheadOfIsSentAtOnce
   EXPECT_EQ(service(0).messages[0].payload.integer("a"), 1);
 }
 
+TEST_F(TWReportingSessionRtcWorkerTest, AMessageForASlowServiceGoesToTheOtherThread) {
+  test.linkReport.setQuick(false);
+  startAndRun();
+  send({{"a", 1}});
+  EXPECT_THAT(service(0).messages, IsEmpty());
+  run();
+  EXPECT_THAT(service(0).messages, SizeIs(1));
+}
+
 TEST_F(TWReportingSessionRtcWorkerTest, MessagesStayInOrderBehindTheStart) {
   startAndRun();
   send({{"a", 1}});
@@ -114,7 +124,19 @@ TEST_F(TWReportingSessionRtcWorkerTest, MessagesStayInOrderBehindTheStart) {
   EXPECT_EQ(service(1).messages[0].payload.integer("a"), 2);
 }
 
+TEST_F(TWReportingSessionRtcWorkerTest, AStopWithoutBackendsStillLogsItsCopiesForDebugging) {
+  test.linkReport.answerAtOnce(std::nullopt);
+  startAndRun();
+  send({{"a", 1}});
+  const std::size_t stored = session->messages().size() + 1;  // and that of the stop
+  session->stop();
+  run();
+  const std::vector<std::string> lines = test.log.textsOf("twrr");
+  EXPECT_EQ(std::count(lines.begin(), lines.end(), "copyWithZone"), static_cast<std::ptrdiff_t>(stored));
+}
+
 TEST_F(TWReportingSessionRtcWorkerTest, AStopWithoutBackendsOnlyLogs) {
+  test.log.setThreshold(LogLevel::kDefault);
   test.linkReport.answerAtOnce(std::nullopt);
   startAndRun();
   send({{"a", 1}});

@@ -16,7 +16,7 @@ class Clock;
 
 // Passes lines on to another log, but only the first kMaxEqualLines of equal lines in a row. How many more
 // there were is said in a line of its own, "equal lines left out: 4711": once a second while they come,
-// before the next other line, and at the end. So messages that arrive by the hundred thousand cannot
+// before the next other line, and at the end in order. So messages that arrive by the hundred thousand cannot
 // fill the log with one line, which would also be most of their cost.
 class CondensingLog final : public Log {
  public:

@@ -28,6 +28,15 @@ std::function<double()> systemJitter() {
   };
 }
 
+// The bytes of what is sent. Only a large payload is worth the copy without the hidden entry.
+std::size_t bytesOf(const LinkReportSession::Payload& payload) {
+  const std::size_t all = payload.entries.bytes();
+  if (all <= LinuxLinkReport::kMaxPayloadBytes || payload.hidden.empty()) return all;
+  ValueMap sent = payload.entries;
+  sent.erase(payload.hidden);
+  return sent.bytes();
+}
+
 }  // namespace
 
 class LinuxLinkReport::Session final : public LinkReportSession {
@@ -61,7 +70,7 @@ class LinuxLinkReport::Session final : public LinkReportSession {
 
   [[nodiscard]] bool sendMessageWithCategory(std::uint16_t category, std::uint16_t type,
                                              const Payload& payload, std::string& problem) override {
-    const std::size_t bytes = payload.entries.bytes();
+    const std::size_t bytes = bytesOf(payload);
     if (bytes > kMaxPayloadBytes) {
       problem = "a payload of " + std::to_string(bytes) + " bytes is too large";
       return false;
@@ -76,6 +85,8 @@ class LinuxLinkReport::Session final : public LinkReportSession {
   void flushMessages() override {
     for (OtlpExporter* exporter : exporters_) exporter->flush();
   }
+
+  bool isQuick() const override { return exporters_.empty(); }
 
   std::string description() const override { return eventName_ + " " + std::to_string(sessionIdentifier_); }
 

@@ -28,7 +28,7 @@ struct LinkReportBackends;
 // preferences and what is sent.
 //
 // startConfigurationWithCompletionHandler() calls its handler at once. An exporter is created when a session
-// first uses an endpoint, and lives as long as the service. One thread at a time.
+// first uses an endpoint, and lives as long as the service. Any thread.
 class LinuxLinkReport final : public LinkReport {
  public:
   static constexpr std::string_view kPreferenceDomain = "com.orvane.linkreport";

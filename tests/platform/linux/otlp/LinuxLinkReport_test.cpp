@@ -190,6 +190,31 @@ TEST_F(LinuxLinkReportTest, RefusesAPayloadThatIsTooLarge) {
   EXPECT_EQ(count("rtc_message"), 0);
 }
 
+TEST_F(LinuxLinkReportTest, AHiddenEntryCountsNotAgainstTheLimit) {
+  const auto session = start();
+  const ValueMap payload{{"a", 1}, {"times", std::string(LinuxLinkReport::kMaxPayloadBytes, 'x')}};
+  EXPECT_TRUE(session->sendMessageWithCategory(4, 2, {payload, "times"}, problem_)) << problem_;
+  EXPECT_FALSE(session->sendMessageWithCategory(4, 2, {payload, "a"}, problem_));
+}
+
+TEST_F(LinuxLinkReportTest, SendsAHiddenEntryToNobody) {
+  configure("backends", ValueArray{"local", receiver_.address()});
+  const auto session = start(false);
+  const ValueMap payload{{"shown", 1}, {"hidden", 2}};
+  ASSERT_TRUE(session->sendMessageWithCategory(4, 2, {payload, "hidden"}, problem_));
+  ASSERT_TRUE(receiver_.waitForRequests(1));
+  const std::string body = receiver_.requests().front().body;
+  EXPECT_THAT(body, HasSubstr("shown"));
+  EXPECT_THAT(body, Not(HasSubstr("hidden")));
+  EXPECT_EQ(text("payload", "rtc_message"), R"({"shown":1})");
+}
+
+TEST_F(LinuxLinkReportTest, IsQuickWithoutAnEndpoint) {
+  EXPECT_TRUE(start()->isQuick());
+  configure("backends", ValueArray{"local", receiver_.address()});
+  EXPECT_FALSE(start()->isQuick());
+}
+
 TEST_F(LinuxLinkReportTest, LimitsTheNumberOfAddresses) {
   for (int n = 0; n < 20; ++n) {
     configure("backends", ValueArray{receiver_.address() + "/" + std::to_string(n)});

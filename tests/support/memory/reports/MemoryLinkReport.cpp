@@ -13,6 +13,7 @@ struct MemoryLinkReport::State {
   bool answersAtOnce GUARDED_BY(mutex) = true;
   LinkReportSession::Backends backends GUARDED_BY(mutex) = std::vector<std::string>{"memory"};
   bool givesTokens GUARDED_BY(mutex) = true;
+  bool isQuick GUARDED_BY(mutex) = true;
   std::size_t tokenCount GUARDED_BY(mutex) = 0;
   std::optional<std::string> problem GUARDED_BY(mutex);
 };
@@ -57,6 +58,11 @@ class MemoryLinkReport::MemorySession final : public LinkReportSession {
     ++session_->flushCount;
   }
 
+  bool isQuick() const override {
+    const MutexLock lock(state_->mutex);
+    return state_->isQuick;
+  }
+
   std::string description() const override { return "MemorySession"; }
 
  private:
@@ -82,6 +88,11 @@ std::unique_ptr<LinkReportSession> MemoryLinkReport::initWithSessionInfo(
   const MutexLock lock(state_->mutex);
   state_->sessions.push_back(session);
   return std::make_unique<MemorySession>(state_, std::move(session));
+}
+
+void MemoryLinkReport::setQuick(bool isQuick) {
+  const MutexLock lock(state_->mutex);
+  state_->isQuick = isQuick;
 }
 
 void MemoryLinkReport::answerAtOnce(LinkReportSession::Backends backends) {

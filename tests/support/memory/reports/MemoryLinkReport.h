@@ -45,6 +45,9 @@ class MemoryLinkReport final : public LinkReport {
   [[nodiscard]] std::unique_ptr<LinkReportSession> initWithSessionInfo(
       const ValueMap& sessionInfo, const ValueMap& userInfo, const ValueArray* frameworksToCheck) override;
 
+  // From now on sessions say that sending takes long, or not. At first it does not.
+  void setQuick(bool isQuick);
+
   // From now on sessions get these backends as soon as they ask; at first {"memory"}.
   void answerAtOnce(LinkReportSession::Backends backends);
   // From now on sessions get an answer only from answer().
