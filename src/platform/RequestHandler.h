@@ -6,9 +6,8 @@
 #include <memory>
 #include <optional>
 #include <utility>
-#include <vector>
 
-#include "protocol/AudioEvent.h"
+#include "protocol/IncomingMessage.h"
 #include "protocol/RequestSet.h"
 #include "values/Value.h"
 
@@ -76,23 +75,14 @@ class InFlightToken {
   std::size_t bytes_ = 0;
 };
 
-// A client's message: the parameters of the request that carries one.
-struct IncomingMessage {
-  ValueMap payload;
-  AudioEventCategory category = 0;
-  AudioEventType type = 0;
-  std::optional<std::vector<ReporterID>> reporterIDs;  // none for nil
-
-  Arguments arguments() const;
-};
-
 // Requests of one connection that arrived together and are not decoded yet.
 class ReceivedRequests {
  public:
   virtual ~ReceivedRequests() = default;
 
   // Decodes the requests in the order of their arrival and gives them to the connection's handler, whose
-  // handleRequest() runs on this thread. Requests that do not fit their method are answered here. Any thread;
+  // handleRequest() and handleMessage() run on this thread. Requests that do not fit their
+  // method are answered here. Any thread;
   // called at most once. Those of one connection, and of all connections of one listener, are delivered one
   // after the other.
   virtual void deliver() = 0;
@@ -107,8 +97,8 @@ class RequestHandler {
   // messaging thread and must not block, unless handleReceived() delivers on another thread.
   virtual void handleRequest(std::size_t method, Arguments arguments, Reply reply, InFlightToken token) = 0;
 
-  // Handles one request whose method carries a message; the payload may be moved away. Does what
-  // handleRequest() does with the same arguments.
+  // Handles one request whose method carries a message, on the thread of handleRequest(). Does what that does
+  // with the same arguments. `message` is valid during the call; its payload may be moved away.
   virtual void handleMessage(std::size_t method, IncomingMessage& message, Reply reply, InFlightToken token) {
     handleRequest(method, message.arguments(), std::move(reply), std::move(token));
   }

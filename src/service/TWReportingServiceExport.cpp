@@ -132,6 +132,9 @@ constexpr auto kHandlerOf = [] {
 }();
 static_assert(std::find(kHandlerOf.begin(), kHandlerOf.end(), kNoHandler) == kHandlerOf.end(),
               "a request has no handler");
+static_assert(std::none_of(requests::kAll.begin(), requests::kAll.end(),
+                           [](const Method& method) { return method.carriesMessage && method.forOwner; }),
+              "the way of messages does not ask who the caller is");
 static_assert(std::size(kHandlers) == requests::kAll.size(), "a handler has no request");
 
 }  // namespace

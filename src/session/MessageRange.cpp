@@ -15,7 +15,6 @@ double sortedTimeOf(const TWReportingSessionMessage& message) {
   return std::isnan(time) ? 0.0 : time;
 }
 
-// Each time is read once, not at every comparison.
 struct Timed {
   double time;
   std::size_t place;
@@ -24,8 +23,8 @@ struct Timed {
 }  // namespace
 
 std::vector<std::size_t> placesByTime(MessageRange messages) {
-  // Mostly the messages came in order. Then nothing is kept. From the first late message on, each time is
-  // read once, not at every comparison.
+  // Mostly the messages came in order. Then nothing is kept. From the first late message on, times are kept,
+  // so that they are not read at every comparison.
   std::vector<Timed> timed;
   double latest = -std::numeric_limits<double>::infinity();
   forEachMessage(messages, [&](std::size_t place, const TWReportingSessionMessage& message) {

@@ -45,6 +45,7 @@ struct TWReportingSessionWorkerClass {
   bool handleSingleMessageSession;
   // Makes a worker; returns null when the worker does not apply to the session. A null pointer for a class
   // whose workers cannot be made.
+  // It must neither start the session nor look at its workers, of which it may be one of several being made.
   Worker (*initWithSession)(const std::shared_ptr<TWReportingSession>& session);
   // The types of messages with which a consumer of this class does something.
   MessageTypes handledTypes = MessageTypes::all();

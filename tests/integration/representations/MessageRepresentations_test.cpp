@@ -79,9 +79,9 @@ class MessageRepresentationsTest : public ReportingTest {
       RpcFrameScanner scanner;
       EXPECT_EQ(scanner.scan(bytes), RpcFrameScanner::Result::kFrame);
       if (shapes != nullptr) {
-        IncomingMessage* const packed =
+        IncomingMessage* const taken =
             decoder.decodeMessage({bytes, scanner.frame().argumentCount, scanner.frame().arguments}, *shapes);
-        if (packed != nullptr) return message(std::move(packed->payload), category, type);
+        if (taken != nullptr) return message(std::move(taken->payload), category, type);
       }
       RpcFrame& frame = decoder.decode(bytes);
       if (frame.refused) return nullptr;

@@ -60,16 +60,20 @@ IncomingMessage* RpcFrameDecoder::decodeMessage(const Frame& frame, ShapeTable& 
   return &message_;
 }
 
+void RpcFrameDecoder::releaseMessage() {
+  message_.payload = {};
+  if (message_.reporterIDs && message_.reporterIDs->capacity() > kMaxKeptIdentifiers) {
+    message_.reporterIDs.reset();
+  }
+}
+
 bool RpcFrameDecoder::readReporterIDs(EncodedValue list) {
   const std::uint8_t first = encoding::byteAt(list.begin());
   if (!encoding::isArray(first)) {
     message_.reporterIDs.reset();
     return first == encoding::kNil;
   }
-  // The vector is used again, unless it is large.
-  if (!message_.reporterIDs || message_.reporterIDs->capacity() > kMaxKeptIdentifiers) {
-    message_.reporterIDs.emplace();
-  }
+  if (!message_.reporterIDs) message_.reporterIDs.emplace();  // else its room is used again
   std::vector<ReporterID>& identifiers = *message_.reporterIDs;
   identifiers.clear();
   bool areIdentifiers = true;

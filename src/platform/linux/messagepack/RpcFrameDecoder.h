@@ -7,11 +7,11 @@
 #include <optional>
 #include <string_view>
 
-#include "platform/RequestHandler.h"
 #include "platform/linux/messagepack/PackedMapReader.h"
 #include "platform/linux/messagepack/RpcFrameReader.h"
 #include "platform/linux/messagepack/RpcFrameScanner.h"
 #include "platform/linux/messagepack/RpcFrameVisitor.h"
+#include "protocol/IncomingMessage.h"
 #include "values/EncodedValue.h"
 
 namespace tonewerk {
@@ -38,6 +38,8 @@ class RpcFrameDecoder {
   // Decodes a request that carries a message. Null when its arguments do not fit, when a value is refused and
   // when the payload cannot be packed: decode() then says what is wrong, or makes a tree of the same values.
   IncomingMessage* decodeMessage(const Frame& frame, ShapeTable& shapes);
+  // Frees what is left of the last message, but for some room for identifiers.
+  void releaseMessage();
 
  private:
   // Reads the sessions' identifiers, or nil.

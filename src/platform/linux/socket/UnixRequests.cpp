@@ -66,8 +66,10 @@ void UnixRequests::deliver(const Request& request, RpcFrameDecoder& decoder, Sha
   Reply reply = request.isNotification ? Reply() : Reply(context_->outbox, request.identifier);
   if (shapes != nullptr && request.method && context_->methods.methods[*request.method].carriesMessage) {
     if (IncomingMessage* message = decoder.decodeMessage(request.frame, *shapes)) {
-      return context_->handler->handleMessage(*request.method, *message, std::move(reply), std::move(token));
+      context_->handler->handleMessage(*request.method, *message, std::move(reply), std::move(token));
+      return decoder.releaseMessage();
     }
+    decoder.releaseMessage();
   }
   RpcFrame& frame = decoder.decode(request.frame.bytes);
   if (const auto problem = problemWith(request, frame)) return reply(problem);

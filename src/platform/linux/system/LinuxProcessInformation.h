@@ -16,8 +16,8 @@ namespace tonewerk {
 class LinuxProcessInformation final : public ProcessInformation {
  public:
   // The maximum age of the footprint with a clock. Many sessions often stop at the same time, and the kernel
-  // takes longer to write the file than a session takes to live. A client at full speed fills less than a
-  // mebibyte meanwhile, and sessions report the footprint in mebibytes.
+  // takes longer to write the file than a session takes to live. So sessions that stop together report the
+  // same footprint, even if one of them has just freed much.
   static constexpr std::chrono::milliseconds kMaxFootprintAge{10};
 
   // Reads the footprint each time. Tests pass another directory instead of "/proc".

@@ -7,6 +7,7 @@
 #include <optional>
 #include <string>
 #include <utility>
+#include <vector>
 
 #include "platform/linux/messagepack/RandomMaps.h"
 #include "platform/linux/messagepack/RpcWriter.h"
@@ -66,6 +67,15 @@ TEST_F(RpcFrameDecoderTest, AMessageHasNothingOfTheOneBefore) {
   ASSERT_NE(message, nullptr);
   EXPECT_EQ(message->payload, (ValueMap{{"a", 1}}));
   EXPECT_THAT(message->reporterIDs, Optional(ElementsAre(9)));
+}
+
+TEST_F(RpcFrameDecoderTest, KeepsNothingOfAMessageThatNobodyTook) {
+  std::vector<Value> many(100'000, Value(1));
+  IncomingMessage* message = decodeMessage(frameOf({kPayload, 4, 1, Value(ValueArray(std::move(many)))}));
+  ASSERT_NE(message, nullptr);
+  decoder.releaseMessage();
+  EXPECT_TRUE(message->payload.empty());
+  EXPECT_EQ(message->reporterIDs, std::nullopt);
 }
 
 TEST_F(RpcFrameDecoderTest, TakesTheLargestNumbersOfEachParameter) {

@@ -1,5 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "platform/RequestHandler.h"
+#include "protocol/IncomingMessage.h"
+
+#include <utility>
 
 namespace tonewerk {
 
