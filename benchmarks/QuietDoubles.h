@@ -72,11 +72,12 @@ class QuietLinkReport final : public LinkReport {
     void startConfigurationWithCompletionHandler(CompletionHandler handler) override {
       handler(std::vector<std::string>{"quiet"});
     }
-    bool sendMessageWithCategory(std::uint16_t, std::uint16_t, const ValueMap& payload,
+    bool sendMessageWithCategory(std::uint16_t, std::uint16_t, const Payload& payload,
                                  std::string&) override {
-      benchmark::DoNotOptimize(payload.size());
+      benchmark::DoNotOptimize(payload.entries.size());
       return true;
     }
+    bool isQuick() const override { return true; }
     void flushMessages() override {}
     std::string description() const override { return "quiet"; }
   };

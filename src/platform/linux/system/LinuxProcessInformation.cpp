@@ -61,7 +61,7 @@ std::variant<std::uint64_t, std::string> LinuxProcessInformation::physicalFootpr
   const MutexLock lock(mutex_);
   if (footprint_ && now - footprint_->at <= kMaxFootprintAge) return footprint_->bytes;
   footprint_.reset();
-  const auto read = readFootprint();
+  auto read = readFootprint();
   if (const auto* bytes = std::get_if<std::uint64_t>(&read)) footprint_ = Footprint{now, *bytes};
   return read;
 }
