@@ -100,6 +100,7 @@ TEST_F(KeptPayloadsTest, GoesOnAfterItWasCleared) {
 
 TEST_F(KeptPayloadsTest, MapsEndOnAnyThread) {
   std::vector<ValueMap> all;
+  all.reserve(20'000);
   for (int number = 0; number < 20'000; ++number) all.push_back(payloads.keep(payload(number)));
   std::vector<ValueMap> copies(all.begin(), all.end());
   std::thread other([taken = std::move(copies)]() mutable { taken.clear(); });

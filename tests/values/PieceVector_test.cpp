@@ -24,6 +24,7 @@ TEST(PieceVectorTest, HoldsWhatAVectorHoldsAtEachLength) {
 TEST(PieceVectorTest, MovesNoElementWhenItGrows) {
   PieceVector<int> pieces;
   std::vector<const int*> addresses;
+  addresses.reserve(1'000);
   for (int element = 0; element < 1'000; ++element) addresses.push_back(&pieces.add(element));
   for (std::size_t place = 0; place < addresses.size(); ++place) ASSERT_EQ(&pieces[place], addresses[place]);
 }

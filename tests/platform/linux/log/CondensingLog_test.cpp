@@ -128,6 +128,7 @@ TEST_F(CondensingLogTest, AnEmptyFirstLineIsWritten) {
 TEST_F(CondensingLogTest, CountsTheLinesOfAllThreads) {
   constexpr int kLines = 1'000;
   std::vector<std::thread> threads;
+  threads.reserve(3);
   for (int thread = 0; thread < 3; ++thread) {
     threads.emplace_back([this] { write("a", kLines); });
   }
