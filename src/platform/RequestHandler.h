@@ -81,11 +81,14 @@ class ReceivedRequests {
   virtual ~ReceivedRequests() = default;
 
   // Decodes the requests in the order of their arrival and gives them to the connection's handler, whose
-  // handleRequest() and handleMessage() run on this thread. Requests that do not fit their
-  // method are answered here. Any thread;
-  // called at most once. Those of one connection, and of all connections of one listener, are delivered one
-  // after the other.
+  // handleRequest() and handleMessage() run on this thread. Requests that do not fit their method are answered
+  // here. Any thread; called at most once. Those of one connection, and of all connections of one listener,
+  // are delivered one after the other.
   virtual void deliver() = 0;
+
+  // Does the same up to the first request of which the handler does not say that it is quick. True when that
+  // were all; else deliver() delivers the others.
+  [[nodiscard]] virtual bool deliverQuick() { return false; }
 };
 
 // Handles the requests of a connection.
@@ -106,6 +109,10 @@ class RequestHandler {
   // Runs on the messaging thread and must not block: delivers the requests, or sees that another thread does,
   // in the order of these calls. A transport that decodes on its own thread calls handleRequest() instead.
   virtual void handleReceived(std::unique_ptr<ReceivedRequests> requests) { requests->deliver(); }
+
+  // True when this request, whose arguments fit, is handled soon and without waiting for anything. `message`
+  // is what the request carries; null for a method that carries none. Asked on the thread of handleRequest().
+  virtual bool isQuick(std::size_t /*method*/, const IncomingMessage* /*message*/) const { return false; }
 
   // The table for the shapes of maps among the arguments; null when they are to be trees. Asked for and used
   // on the thread that delivers.

@@ -20,6 +20,17 @@ class SerialQueue {
   // Never blocks. The work is destroyed on the queue, right after it has run.
   virtual void async(Task work) = 0;
 
+  // Runs `work` at once, on the calling thread and as the queue's own work, when nothing else runs or is
+  // queued. Returns false, without running it, otherwise; a queue may always do that. What is queued meanwhile
+  // waits, so `work` must be short. Any thread; not in the queue's own work.
+  template <typename Work>
+  [[nodiscard]] bool runAtOnce(Work&& work) {
+    if (!tryLend()) return false;
+    const Loan loan(*this);
+    work();
+    return true;
+  }
+
   // Returns when everything queued before the call has run. Do not call it from the queue's own work.
   virtual void drain() = 0;
 
@@ -31,6 +42,22 @@ class SerialQueue {
   virtual bool ownsThisThread() const { return isCurrent(); }
 
   virtual const std::string& name() const = 0;
+
+ private:
+  class Loan {
+   public:
+    explicit Loan(SerialQueue& queue) : queue_(queue) {}
+    Loan(const Loan&) = delete;
+    Loan& operator=(const Loan&) = delete;
+    ~Loan() { queue_.takeBack(); }
+
+   private:
+    SerialQueue& queue_;
+  };
+
+  // Makes the calling thread the one that runs this queue's work, until takeBack(), when there is none.
+  [[nodiscard]] virtual bool tryLend() { return false; }
+  virtual void takeBack() {}
 };
 
 enum class QueuePriority {

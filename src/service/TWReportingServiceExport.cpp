@@ -13,6 +13,7 @@
 #include "platform/SerialQueue.h"
 #include "protocol/Requests.h"
 #include "service/WatchRequests.h"
+#include "session/TWReportingContext.h"
 #include "session/TWReportingUtility.h"
 
 namespace tonewerk {
@@ -162,8 +163,17 @@ std::optional<ReplyError> TWReportingServiceExport::takeRole(const Method& metho
 }
 
 void TWReportingServiceExport::handleReceived(std::unique_ptr<ReceivedRequests> requests) {
-  TWReportingUtilityGetReportingServerQueue().async(
-      [received = std::move(requests)] { received->deliver(); });
+  SerialQueue& queue = TWReportingUtilityGetReportingServerQueue();
+  bool areAllDelivered = false;
+  if (queue.runAtOnce([&] { areAllDelivered = requests->deliverQuick(); }) && areAllDelivered) return;
+  queue.async([received = std::move(requests)] { received->deliver(); });
+}
+
+bool TWReportingServiceExport::isQuick(std::size_t method, const IncomingMessage* message) const {
+  const Method& called = requests::kAll[method];
+  if (message == nullptr) return !called.carriesMessage && !called.changesState && !called.forOwner;
+  if (!message->reporterIDs || message->reporterIDs->size() != 1) return false;  // there may be many sessions
+  return !TWReportingContext::current().workerRegistry().slowTypes().contains(message->type);
 }
 
 bool TWReportingServiceExport::isUrgent(std::size_t method) {

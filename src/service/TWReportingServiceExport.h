@@ -30,8 +30,12 @@ class TWReportingServiceExport final : public RequestHandler {
   // and for urgent requests, on the messaging thread.
   void handleRequest(std::size_t method, Arguments arguments, Reply reply, InFlightToken token) override;
   void handleMessage(std::size_t method, IncomingMessage& message, Reply reply, InFlightToken token) override;
-  // Has the work queue deliver the requests, so that no value is made on one thread and freed on another.
+  // Delivers the requests as the work queue's own work, so that no value is made on one thread and freed on
+  // another: quick ones at once on this thread when the queue has nothing to do, because waking its thread
+  // costs more than a message; all others on its thread.
   void handleReceived(std::unique_ptr<ReceivedRequests> requests) override;
+  // True for requests that only read, and for messages to one session whose type makes no worker wait.
+  bool isQuick(std::size_t method, const IncomingMessage* message) const override;
   ShapeTable* shapes() override { return shapes_.get(); }
   // True for the request to end the process, which does not wait for the work queue. But when the connection
   // has asked to be an onlooker and may be one by now, the answer to that comes first.

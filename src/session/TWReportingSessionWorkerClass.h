@@ -19,8 +19,13 @@ namespace tonewerk {
 // or not at all.
 class MessageTypes {
  public:
+  static constexpr MessageTypes none() { return MessageTypes(0); }
   static constexpr MessageTypes all() { return MessageTypes(~std::uint64_t{0}); }
   static constexpr MessageTypes only(AudioEventType type) { return MessageTypes(bitOf(type)); }
+
+  friend constexpr MessageTypes operator|(MessageTypes a, MessageTypes b) {
+    return MessageTypes(a.bits_ | b.bits_);
+  }
 
   constexpr bool contains(AudioEventType type) const { return (bits_ & bitOf(type)) != 0; }
 
@@ -49,6 +54,8 @@ struct TWReportingSessionWorkerClass {
   Worker (*initWithSession)(const std::shared_ptr<TWReportingSession>& session);
   // The types of messages with which a consumer of this class does something.
   MessageTypes handledTypes = MessageTypes::all();
+  // The types of messages for which a consumer of this class may wait, for a time or a tool.
+  MessageTypes slowTypes = MessageTypes::none();
 
   std::string description() const { return std::string(name); }
 };
@@ -71,6 +78,12 @@ template <typename T>
 constexpr MessageTypes handledTypes() {
   if constexpr (requires { T::kHandledTypes; }) return T::kHandledTypes;
   return MessageTypes::all();
+}
+
+template <typename T>
+constexpr MessageTypes slowTypes() {
+  if constexpr (requires { T::kSlowTypes; }) return T::kSlowTypes;
+  return MessageTypes::none();
 }
 
 using Session = std::shared_ptr<TWReportingSession>;
@@ -107,7 +120,8 @@ constexpr TWReportingSessionWorkerClass workerClassOf(std::string_view name) {
           worker_class_detail::startsOnInit<T>(),
           worker_class_detail::handlesSingleMessageSession<T>(),
           worker_class_detail::maker<T>(),
-          worker_class_detail::handledTypes<T>()};
+          worker_class_detail::handledTypes<T>(),
+          worker_class_detail::slowTypes<T>()};
 }
 
 }  // namespace tonewerk

@@ -12,6 +12,7 @@ class TWReportingSessionMessage;
 // A class may have two static functions that return true: startOnInit(), to be made and started with the
 // session, and handleSingleMessageSession(), to run in single-message sessions, too. One that does nothing
 // with messages of other types may say so in a static constant `kHandledTypes`; it then does not get them.
+// One that may wait in handleMessage() must say for which types in a constant `kSlowTypes`.
 class TWReportingSessionWorkerConsumerProtocol : public virtual TWReportingSessionWorkerProtocol {
  public:
   // `message` is the session's own record: take a copy to keep or change it. The result is ignored.

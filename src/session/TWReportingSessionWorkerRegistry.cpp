@@ -16,7 +16,10 @@ TWReportingSessionWorkerRegistry::TWReportingSessionWorkerRegistry(Classes all) 
       continue;
     }
     valid_.push_back(workerClass);
-    if (workerClass->isConsumer) consumers_.push_back(workerClass);
+    if (workerClass->isConsumer) {
+      consumers_.push_back(workerClass);
+      slowTypes_ = slowTypes_ | workerClass->slowTypes;
+    }
     if (workerClass->isProducer) producers_.push_back(workerClass);
     if (workerClass->startOnInit) startOnInit_.push_back(workerClass);
   }

@@ -20,6 +20,8 @@ class TWReportingSessionWorkerRegistry {
   const Classes& consumerClasses() const { return consumers_; }
   const Classes& producerClasses() const { return producers_; }
   const Classes& startOnInitClasses() const { return startOnInit_; }
+  // The types of messages for which a worker of any class may wait.
+  MessageTypes slowTypes() const { return slowTypes_; }
 
  private:
   Classes all_;
@@ -27,6 +29,7 @@ class TWReportingSessionWorkerRegistry {
   Classes consumers_;
   Classes producers_;
   Classes startOnInit_;
+  MessageTypes slowTypes_ = MessageTypes::none();
 };
 
 }  // namespace tonewerk

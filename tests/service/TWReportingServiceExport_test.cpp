@@ -10,6 +10,7 @@
 #include "service/WatchRequests.h"
 #include "session/TWReportingUtility.h"
 #include "support/ServiceTest.h"
+#include "workers/TWReportingWorkerClasses.h"
 
 namespace tonewerk {
 namespace {
@@ -60,6 +61,81 @@ TEST_F(TWReportingServiceExportTest, HasTheWorkQueueDeliverWhatWasReceived) {
   EXPECT_EQ(deliveries, 0);
   run();
   EXPECT_EQ(deliveries, 1);
+}
+
+// Of which some can be delivered at once.
+class QuickRequests final : public ReceivedRequests {
+ public:
+  struct Deliveries {
+    int quick = 0;
+    int rest = 0;
+  };
+  QuickRequests(Deliveries& deliveries, bool areAllQuick)
+      : deliveries_(deliveries), areAllQuick_(areAllQuick) {}
+
+  void deliver() override { ++deliveries_.rest; }
+  bool deliverQuick() override {
+    EXPECT_TRUE(TWReportingUtilityGetReportingServerQueue().isCurrent());
+    ++deliveries_.quick;
+    return areAllQuick_;
+  }
+
+ private:
+  Deliveries& deliveries_;
+  const bool areAllQuick_;
+};
+
+TEST_F(TWReportingServiceExportTest, DeliversQuickRequestsAtOnceWhileTheWorkQueueHasNothingToDo) {
+  ManualSerialQueue& queue = *test.queues.find(TWReportingUtilityGetReportingServerQueue().name());
+  queue.allowRunningAtOnce();
+  run();
+  QuickRequests::Deliveries deliveries;
+  object->handleReceived(std::make_unique<QuickRequests>(deliveries, true));
+  EXPECT_EQ(deliveries.quick, 1);
+  EXPECT_EQ(queue.pendingCount(), 0U);
+}
+
+TEST_F(TWReportingServiceExportTest, HasTheWorkQueueDeliverWhatIsNotQuick) {
+  ManualSerialQueue& queue = *test.queues.find(TWReportingUtilityGetReportingServerQueue().name());
+  queue.allowRunningAtOnce();
+  run();
+  QuickRequests::Deliveries deliveries;
+  object->handleReceived(std::make_unique<QuickRequests>(deliveries, false));
+  EXPECT_EQ(deliveries.rest, 0);
+  object->handleReceived(std::make_unique<QuickRequests>(deliveries, true));  // not before the first ones
+  EXPECT_EQ(deliveries.quick, 1);
+  run();
+  EXPECT_EQ(deliveries.rest, 2);
+}
+
+TEST_F(TWReportingServiceExportTest, RequestsThatOnlyReadAreQuick) {
+  for (std::size_t method = 0; method < requests::kAll.size(); ++method) {
+    const std::string_view name = requests::kAll[method].name;
+    const bool onlyReads = name == "getServiceNameForReporterID" || name == "reporterIDValid" ||
+                           name == "getAllReporters" || name == "observe";
+    EXPECT_EQ(object->isQuick(method, nullptr), onlyReads) << name;
+  }
+}
+
+TEST_F(TWReportingServiceExportTest, AMessageIsQuickForOneSessionAndATypeThatMakesNobodyWait) {
+  const std::size_t method = indexOf(requests::kSendMessage);
+  IncomingMessage message;
+  message.type = kTypeStart;
+  EXPECT_FALSE(object->isQuick(method, &message));  // for all sessions
+  message.reporterIDs = {77};
+  EXPECT_TRUE(object->isQuick(method, &message));
+  message.reporterIDs = {77, 78};
+  EXPECT_FALSE(object->isQuick(method, &message));
+}
+
+TEST(TWReportingServiceExportWorkersTest, AMessageIsNotQuickWhenAWorkerMayWaitForIt) {
+  MessageTypes slow = MessageTypes::none();
+  for (const TWReportingSessionWorkerClass* workerClass : allWorkerClasses())
+    slow = slow | workerClass->slowTypes;
+  EXPECT_TRUE(slow.contains(kTypeError));      // a stall trace may begin after a pause
+  EXPECT_TRUE(slow.contains(kTypeMemoryLog));  // runs tools
+  EXPECT_FALSE(slow.contains(kTypeStart));
+  EXPECT_FALSE(slow.contains(kTypeUnknown));
 }
 
 TEST_F(TWReportingServiceExportTest, RequestsThatTheWorkQueueDeliversRunAtOnceAndInOrder) {

@@ -16,6 +16,7 @@ class TWReportingSessionMemoryLogWorker final : public TWReportingSessionWorkerC
   static const TWReportingSessionWorkerClass kWorkerClass;
   const TWReportingSessionWorkerClass& workerClass() const override { return kWorkerClass; }
   static constexpr MessageTypes kHandledTypes = MessageTypes::only(kTypeMemoryLog);
+  static constexpr MessageTypes kSlowTypes = kHandledTypes;
   static constexpr bool startOnInit() { return true; }
 
   [[nodiscard]] static std::shared_ptr<TWReportingSessionMemoryLogWorker> initWithSession(

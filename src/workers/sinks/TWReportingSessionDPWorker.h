@@ -18,6 +18,7 @@ class TWReportingDefaults;
 class TWReportingSessionDPWorker final : public TWReportingSessionWorkerConsumerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
+  static constexpr MessageTypes kSlowTypes = MessageTypes::only(kTypeError);
   const TWReportingSessionWorkerClass& workerClass() const override { return kWorkerClass; }
 
   // The longest wait before a request, even when "wait_time" is longer: nothing else happens meanwhile.

@@ -16,6 +16,13 @@ void ManualSerialQueue::async(Task work) {
   pending_.push_back(std::move(work));
 }
 
+bool ManualSerialQueue::tryLend() {
+  assert(!isCurrent());
+  if (!mayLend_ || pendingCount() > 0) return false;
+  runner_ = std::this_thread::get_id();
+  return true;
+}
+
 std::size_t ManualSerialQueue::runAll() {
   assert(!isCurrent());
   std::size_t count = 0;

@@ -36,6 +36,9 @@ class ManualSerialQueue final : public SerialQueue {
   bool ownsThisThread() const override { return isCurrent() || std::this_thread::get_id() == maker_; }
   const std::string& name() const override { return name_; }
 
+  // From now on runAtOnce() runs work, while none is queued.
+  void allowRunningAtOnce() { mayLend_ = true; }
+
   // Runs work until none waits. Returns how many pieces ran. Do not call it from the queue's own work.
   std::size_t runAll();
   std::size_t pendingCount() const;
@@ -45,12 +48,16 @@ class ManualSerialQueue final : public SerialQueue {
   void setDestructionHandler(std::function<void()> handler) { onDestruction_ = std::move(handler); }
 
  private:
+  [[nodiscard]] bool tryLend() override;
+  void takeBack() override { runner_ = std::thread::id(); }
+
   const std::string name_;
   const QueuePriority priority_;
   const std::thread::id maker_ = std::this_thread::get_id();
   mutable Mutex mutex_;
   std::vector<Task> pending_ GUARDED_BY(mutex_);
   std::atomic<std::thread::id> runner_{};
+  bool mayLend_ = false;
   std::function<void()> onDestruction_;
 };
 

@@ -54,27 +54,53 @@ void UnixRequests::deliverAtOnce() {
   deliver(decoder, nullptr);
 }
 
+bool UnixRequests::deliverQuick() {
+  ShapeTable* const shapes = context_->handler->shapes();
+  while (delivered_ < requests_.size()) {
+    if (!deliverNext(*context_->decoder, shapes, Wanted::kQuick)) return false;
+  }
+  return true;
+}
+
 void UnixRequests::deliver(RpcFrameDecoder& decoder, ShapeTable* shapes) {
   while (delivered_ < requests_.size()) {
-    deliver(requests_[delivered_++], decoder, shapes);
-    BatchScope::pieceHasRun();
+    if (!deliverNext(decoder, shapes, Wanted::kAll)) return;
   }
 }
 
-void UnixRequests::deliver(const Request& request, RpcFrameDecoder& decoder, ShapeTable* shapes) {
-  InFlightToken token(context_->window, bytesOf(request));
-  Reply reply = request.isNotification ? Reply() : Reply(context_->outbox, request.identifier);
+bool UnixRequests::deliverNext(RpcFrameDecoder& decoder, ShapeTable* shapes, Wanted wanted) {
+  const Request& request = requests_[delivered_];
+  RequestHandler& handler = *context_->handler;
+  const auto isWanted = [&](const IncomingMessage* message) {
+    return wanted == Wanted::kAll || handler.isQuick(*request.method, message);
+  };
   if (shapes != nullptr && request.method && context_->methods.methods[*request.method].carriesMessage) {
     if (IncomingMessage* message = decoder.decodeMessage(request.frame, *shapes)) {
-      context_->handler->handleMessage(*request.method, *message, std::move(reply), std::move(token));
-      return decoder.releaseMessage();
+      const bool isTaken = isWanted(message);
+      if (isTaken) handler.handleMessage(*request.method, *message, replyTo(request), takeNext());
+      decoder.releaseMessage();
+      if (isTaken) BatchScope::pieceHasRun();
+      return isTaken;
     }
     decoder.releaseMessage();
   }
   RpcFrame& frame = decoder.decode(request.frame.bytes);
-  if (const auto problem = problemWith(request, frame)) return reply(problem);
-  context_->handler->handleRequest(*request.method, std::move(frame.arguments), std::move(reply),
-                                   std::move(token));
+  if (const auto problem = problemWith(request, frame)) {
+    const InFlightToken token = takeNext();
+    replyTo(request)(problem);
+  } else if (isWanted(nullptr)) {
+    handler.handleRequest(*request.method, std::move(frame.arguments), replyTo(request), takeNext());
+  } else {
+    return false;
+  }
+  BatchScope::pieceHasRun();
+  return true;
+}
+
+InFlightToken UnixRequests::takeNext() { return {context_->window, bytesOf(requests_[delivered_++])}; }
+
+Reply UnixRequests::replyTo(const Request& request) const {
+  return request.isNotification ? Reply() : Reply(context_->outbox, request.identifier);
 }
 
 std::optional<ReplyError> UnixRequests::problemWith(const Request& request, const RpcFrame& frame) const {

@@ -48,6 +48,7 @@ class UnixRequests final : public ReceivedRequests {
   void addFirst(const RpcFrameScanner::Frame& frame, std::string bytes, std::optional<std::size_t> method);
 
   void deliver() override;
+  [[nodiscard]] bool deliverQuick() override;
   // Delivers on the messaging thread, while another thread may deliver other requests of the same listener.
   void deliverAtOnce();
 
@@ -59,8 +60,14 @@ class UnixRequests final : public ReceivedRequests {
     std::optional<std::size_t> method;
   };
 
+  enum class Wanted { kAll, kQuick };
+
   void deliver(RpcFrameDecoder& decoder, ShapeTable* shapes);
-  void deliver(const Request& request, RpcFrameDecoder& decoder, ShapeTable* shapes);
+  // False when the next request is not one of the wanted ones. It is then not delivered.
+  [[nodiscard]] bool deliverNext(RpcFrameDecoder& decoder, ShapeTable* shapes, Wanted wanted);
+  // Counts the next request as delivered. What is returned counts it as finished.
+  InFlightToken takeNext();
+  Reply replyTo(const Request& request) const;
   [[nodiscard]] std::optional<ReplyError> problemWith(const Request& request, const RpcFrame& frame) const;
   // The bytes that the request counts for in the window.
   std::size_t bytesOf(const Request& request) const;

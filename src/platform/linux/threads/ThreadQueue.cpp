@@ -39,7 +39,29 @@ void ThreadQueue::async(Task work) {
   {
     const MutexLock lock(mutex_);
     pending_.push_back(std::move(work));
-    mustWake = std::exchange(isWaiting_, false);
+    mustWake = !isLent_ && std::exchange(isWaiting_, false);
+  }
+  if (mustWake) workArrived_.notifyOne();
+}
+
+bool ThreadQueue::tryLend() {
+  assert(!isCurrent());
+  {
+    const MutexLock lock(mutex_);
+    if (!isWaiting_ || isLent_) return false;  // a waiting thread has nothing pending
+    isLent_ = true;
+  }
+  borrower_.store(std::this_thread::get_id(), std::memory_order_relaxed);
+  return true;
+}
+
+void ThreadQueue::takeBack() {
+  borrower_.store(std::thread::id(), std::memory_order_relaxed);
+  bool mustWake = false;
+  {
+    const MutexLock lock(mutex_);
+    isLent_ = false;
+    mustWake = !pending_.empty() && std::exchange(isWaiting_, false);
   }
   if (mustWake) workArrived_.notifyOne();
 }
@@ -73,8 +95,8 @@ void ThreadQueue::run() {
 
 bool ThreadQueue::waitForWork(std::vector<Task>& batch) {
   MutexLock lock(mutex_);
-  while (pending_.empty()) {
-    if (isEnding_) return false;
+  while (pending_.empty() || isLent_) {
+    if (isEnding_ && !isLent_) return false;
     isWaiting_ = true;
     workArrived_.wait(lock);
   }

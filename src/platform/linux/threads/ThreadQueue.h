@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <atomic>
 #include <thread>
 #include <vector>
 
@@ -9,7 +10,7 @@
 
 namespace tonewerk {
 
-// Runs a serial queue's work on its own thread.
+// Runs a serial queue's work on its own thread, or, by runAtOnce(), on another one while its own waits.
 //
 // async() holds the lock only while it adds the work, and wakes the thread only when it is waiting. The
 // thread takes all pending work at once and runs it without the lock.
@@ -22,10 +23,15 @@ class ThreadQueue final : public SerialQueue {
 
   void async(Task work) override;
   void drain() override;
-  bool isCurrent() const override { return std::this_thread::get_id() == thread_.get_id(); }
+  bool isCurrent() const override {
+    const std::thread::id here = std::this_thread::get_id();
+    return here == thread_.get_id() || here == borrower_.load(std::memory_order_relaxed);
+  }
   const std::string& name() const override { return name_; }
 
  private:
+  [[nodiscard]] bool tryLend() override;
+  void takeBack() override;
   void run();
   // Moves all pending work into `batch`, which is empty before. False when the queue ends and no work is
   // left.
@@ -36,9 +42,11 @@ class ThreadQueue final : public SerialQueue {
   Mutex mutex_;
   std::vector<Task> pending_ GUARDED_BY(mutex_);
   bool isWaiting_ GUARDED_BY(mutex_) = false;  // the thread waits for work, or is about to
+  bool isLent_ GUARDED_BY(mutex_) = false;  // another thread runs the queue's work, while the own one waits
   bool isEnding_ GUARDED_BY(mutex_) = false;
   Condition workArrived_;
-  std::thread thread_;  // last, because it uses all members above
+  std::atomic<std::thread::id> borrower_;  // none while the queue is not lent
+  std::thread thread_;                     // last, because it uses all members above
 };
 
 }  // namespace tonewerk

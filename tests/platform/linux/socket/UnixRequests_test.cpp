@@ -79,7 +79,7 @@ class Deliveries {
   std::vector<Call> calls_ GUARDED_BY(mutex_);
 };
 
-// Keeps what it receives until the test delivers it. Requests of "fail" are urgent.
+// Keeps what it receives until the test delivers it. Requests of "fail" are urgent, those of "takeInt64" quick.
 class LateHandler final : public RequestHandler {
  public:
   explicit LateHandler(Deliveries& deliveries) : deliveries_(deliveries) {}
@@ -93,6 +93,9 @@ class LateHandler final : public RequestHandler {
     deliveries_.keep(std::move(requests));
   }
   bool isUrgent(std::size_t method) override { return nameOf(method) == "fail"; }
+  bool isQuick(std::size_t method, const IncomingMessage* /*message*/) const override {
+    return nameOf(method) == "takeInt64";
+  }
 
  private:
   static std::string nameOf(std::size_t method) { return std::string(rigInterface().methods[method].name); }
@@ -192,6 +195,40 @@ TEST_F(UnixRequestsTest, ABadRequestIsAnsweredWhenItsTurnComes) {
     ASSERT_TRUE(response);
     EXPECT_EQ(response->identifier, identifier);
     EXPECT_EQ(response->error.has_value(), identifier != 1);
+  }
+  EXPECT_THAT(deliveries.calls(), SizeIs(1));
+}
+
+TEST_F(UnixRequestsTest, QuickRequestsAreDeliveredUpToTheFirstThatIsNotAndTheOthersLater) {
+  RawClient client(path);
+  ASSERT_TRUE(client.send(requestOf(1, "takeInt64", {Value(1)}) + requestOf(2, "takeInt64", {Value(2)}) +
+                          requestOf(3, "takeMap", {Value(ValueMap{})}) +
+                          requestOf(4, "takeInt64", {Value(4)})));
+  const auto waiting = deliveries.takeWaiting();
+  ASSERT_THAT(waiting, SizeIs(1));
+  EXPECT_FALSE(waiting[0]->deliverQuick());
+  EXPECT_THAT(deliveries.methods(), ElementsAre("takeInt64", "takeInt64"));
+  waiting[0]->deliver();
+  EXPECT_THAT(deliveries.methods(), ElementsAre("takeInt64", "takeInt64", "takeMap", "takeInt64"));
+  for (const std::uint32_t identifier : {1U, 2U, 3U, 4U}) {
+    const auto response = client.response();
+    ASSERT_TRUE(response);
+    EXPECT_EQ(response->identifier, identifier);
+  }
+}
+
+TEST_F(UnixRequestsTest, RequestsThatAreAllQuickOrBadNeedNoSecondDelivery) {
+  RawClient client(path);
+  ASSERT_TRUE(client.send(requestOf(1, "unheardOf", {}) + requestOf(2, "takeInt64", {Value("text")}) +
+                          requestOf(3, "takeInt64", {Value(3)})));
+  const auto waiting = deliveries.takeWaiting();
+  ASSERT_THAT(waiting, SizeIs(1));
+  EXPECT_TRUE(waiting[0]->deliverQuick());
+  for (const std::uint32_t identifier : {1U, 2U, 3U}) {
+    const auto response = client.response();
+    ASSERT_TRUE(response);
+    EXPECT_EQ(response->identifier, identifier);
+    EXPECT_EQ(response->error.has_value(), identifier != 3);
   }
   EXPECT_THAT(deliveries.calls(), SizeIs(1));
 }

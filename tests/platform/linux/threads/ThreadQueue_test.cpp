@@ -6,6 +6,7 @@
 #include <gtest/gtest.h>
 #include <pthread.h>
 #include <string>
+#include <thread>
 
 namespace tonewerk {
 namespace {
@@ -36,6 +37,81 @@ TEST(ThreadQueueTest, SurvivesABurst) {
   for (int number = 0; number < 20'000; ++number) queue.async([&ran] { ++ran; });
   queue.drain();
   EXPECT_EQ(ran, 20'000);
+}
+
+// The queue's own thread is about to wait some time after it was made or has run work.
+template <typename Work>
+void runAtOnceWhenItWaits(ThreadQueue& queue, const Work& work) {
+  while (!queue.runAtOnce(work)) std::this_thread::yield();
+}
+
+TEST(ThreadQueueTest, RunsWorkAtOnceOnTheCallingThreadWhileItWaits) {
+  ThreadQueue queue("work", QueuePriority::kUtility);
+  std::thread::id thread;
+  bool wasCurrent = false;
+  runAtOnceWhenItWaits(queue, [&] {
+    thread = std::this_thread::get_id();
+    wasCurrent = queue.isCurrent();
+  });
+  EXPECT_EQ(thread, std::this_thread::get_id());
+  EXPECT_TRUE(wasCurrent);
+  EXPECT_FALSE(queue.isCurrent());
+}
+
+TEST(ThreadQueueTest, RunsNothingAtOnceWhileWorkRunsOrIsQueued) {
+  ThreadQueue queue("work", QueuePriority::kUtility);
+  std::promise<void> begun;
+  std::promise<void> end;
+  queue.async([&] {
+    begun.set_value();
+    end.get_future().wait();
+  });
+  int ran = 0;
+  EXPECT_FALSE(queue.runAtOnce([&] { ++ran; }));  // queued or running
+  begun.get_future().wait();
+  EXPECT_FALSE(queue.runAtOnce([&] { ++ran; }));  // running
+  end.set_value();
+  queue.drain();
+  EXPECT_EQ(ran, 0);
+}
+
+TEST(ThreadQueueTest, RunsNothingAtOnceWhileAnotherThreadDoes) {
+  ThreadQueue queue("work", QueuePriority::kUtility);
+  bool didRun = true;
+  runAtOnceWhenItWaits(queue, [&] { std::thread([&] { didRun = queue.runAtOnce([] {}); }).join(); });
+  EXPECT_FALSE(didRun);
+}
+
+TEST(ThreadQueueTest, WorkThatIsQueuedMeanwhileRunsAfterwardsOnTheOwnThread) {
+  ThreadQueue queue("work", QueuePriority::kUtility);
+  bool hasEnded = false;
+  bool ranAfterwards = false;
+  std::thread::id thread;
+  runAtOnceWhenItWaits(queue, [&] {
+    queue.async([&] {
+      ranAfterwards = hasEnded;
+      thread = std::this_thread::get_id();
+    });
+    hasEnded = true;
+  });
+  queue.drain();
+  EXPECT_TRUE(ranAfterwards);
+  EXPECT_NE(thread, std::this_thread::get_id());
+}
+
+TEST(ThreadQueueTest, NeverRunsTwoPiecesAtATimeWhoeverRunsThem) {
+  constexpr int kPieces = 20'000;
+  ThreadQueue queue("work", QueuePriority::kUtility);
+  int ran = 0;  // without a lock: the queue is one
+  std::thread other([&] {
+    for (int number = 0; number < kPieces; ++number) queue.async([&ran] { ++ran; });
+  });
+  for (int number = 0; number < kPieces; ++number) {
+    if (!queue.runAtOnce([&ran] { ++ran; })) queue.async([&ran] { ++ran; });
+  }
+  other.join();
+  queue.drain();
+  EXPECT_EQ(ran, 2 * kPieces);
 }
 
 }  // namespace
