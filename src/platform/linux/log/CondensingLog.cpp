@@ -35,7 +35,7 @@ bool CondensingLog::isCounted(std::string_view category, LogLevel level, std::st
     return false;
   }
   if (++equalLines_ <= kMaxEqualLines) return false;
-  const std::chrono::nanoseconds now = clock_.monotonic();
+  const std::chrono::nanoseconds now = clock_.coarseMonotonic();
   if (unsaid_++ == 0) saidAt_ = now;
   if (now - saidAt_ >= kCountPeriod) writeCount();
   return true;

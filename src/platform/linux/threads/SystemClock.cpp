@@ -8,22 +8,29 @@
 namespace tonewerk {
 namespace {
 
-timespec timeOf(clockid_t clock) {
+double secondsOf(clockid_t clock) {
   timespec time{};
   clock_gettime(clock, &time);
-  return time;
+  return static_cast<double>(time.tv_sec) + static_cast<double>(time.tv_nsec) * 1e-9;
+}
+
+std::chrono::nanoseconds nanosecondsOf(clockid_t clock) {
+  timespec time{};
+  clock_gettime(clock, &time);
+  return std::chrono::seconds(time.tv_sec) + std::chrono::nanoseconds(time.tv_nsec);
 }
 
 }  // namespace
 
-double SystemClock::now() const {
-  const timespec time = timeOf(CLOCK_REALTIME);
-  return static_cast<double>(time.tv_sec) + static_cast<double>(time.tv_nsec) * 1e-9;
-}
+double SystemClock::now() const { return secondsOf(CLOCK_REALTIME); }
 
-std::chrono::nanoseconds SystemClock::monotonic() const {
-  const timespec time = timeOf(CLOCK_MONOTONIC);
-  return std::chrono::seconds(time.tv_sec) + std::chrono::nanoseconds(time.tv_nsec);
+std::chrono::nanoseconds SystemClock::monotonic() const { return nanosecondsOf(CLOCK_MONOTONIC); }
+
+// The kernel updates these at each tick of its timer, at least a hundred times a second.
+double SystemClock::coarseNow() const { return secondsOf(CLOCK_REALTIME_COARSE); }
+
+std::chrono::nanoseconds SystemClock::coarseMonotonic() const {
+  return nanosecondsOf(CLOCK_MONOTONIC_COARSE);
 }
 
 std::chrono::minutes SystemClock::utcOffset(double at) const {

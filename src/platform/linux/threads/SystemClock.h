@@ -11,6 +11,8 @@ class SystemClock final : public Clock {
  public:
   double now() const override;
   std::chrono::nanoseconds monotonic() const override;
+  double coarseNow() const override;
+  std::chrono::nanoseconds coarseMonotonic() const override;
   // 0 for a time outside the range of the calendar functions.
   std::chrono::minutes utcOffset(double at) const override;
   void sleep(std::chrono::nanoseconds duration) override;
