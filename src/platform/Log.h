@@ -185,6 +185,21 @@ using Format = CheckedFormat<std::type_identity_t<Arguments>...>;
 // Returns "%25s:%-5d " of the file's base name without its ending, and the line.
 std::string logPrefix(std::string_view file, int line);
 
+// A line without arguments that is written very often. Its text is made once.
+class FixedLogLine {
+ public:
+  explicit FixedLogLine(std::string_view message, const char* file = __builtin_FILE(),
+                        int line = __builtin_LINE())
+      : text_(logPrefix(file, line).append(message)) {}
+
+  void write(LogLevel level, const LogCategory& category) const {
+    if (category.isEnabled(level)) category.write(level, text_);
+  }
+
+ private:
+  const std::string text_;
+};
+
 template <typename... Arguments>
 void logLine(LogLevel level, const LogSite& site, std::string_view format, const Arguments&... arguments) {
   if (site.category == nullptr || !site.category->isEnabled(level)) return;

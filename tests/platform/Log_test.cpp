@@ -92,6 +92,20 @@ TEST(LogTest, ShowsValuesListsAndAbsentValues) {
   EXPECT_THAT(log.textsOf("twrs"), ElementsAre(R"({"a":1} (null) (1, 2) (null))"));
 }
 
+TEST(LogTest, AFixedLineIsAsIfItWereWrittenWhereItIsMade) {
+  MemoryLog log;
+  log.setThreshold("twrs", LogLevel::kDefault);
+  const LogCategory category(log, "com.orvane.tonewerk", "twrs");
+  const FixedLogLine line("100% x");
+  const int number = __LINE__ - 1;
+  line.write(LogLevel::kInfo, category);
+  EXPECT_TRUE(log.lines().empty());
+  line.write(LogLevel::kError, category);
+  ASSERT_EQ(log.lines().size(), 1U);
+  EXPECT_EQ(log.lines()[0].level, LogLevel::kError);
+  EXPECT_EQ(log.lines()[0].message, logPrefix("Log_test.cpp", number) + "100% x");
+}
+
 TEST(LogTest, FormatsNothingWithoutACategory) {
   const LogCategory* none = nullptr;
   bool wasAsked = false;

@@ -22,6 +22,7 @@ const Value TWReportingClientNameTonewerk("com.orvane.tonewerk");
 constexpr double TWReportingVersionNumber = 2.1;
 constexpr std::int64_t kClientType = 19;
 const SharedString kSessionIdentifierKey("TWReportingSessionID");
+const FixedLogLine kMessageNeverStarted("Session never started. handleMessage");
 
 std::string textOf(const LinkReportSession::Payload& payload) {
   std::string text;
@@ -149,7 +150,7 @@ void RtcReporter::resume() {
 void RtcReporter::handleMessage(const TWReportingSessionMessage& message) {
   assert(queue_->ownsThisThread());
   if (!linkReportSessionStarted_) {
-    defaultLog(TWReportingSessionLinkReportCategory(), "Session never started. %s", "handleMessage");
+    kMessageNeverStarted.write(LogLevel::kDefault, *TWReportingSessionLinkReportCategory());
     return;
   }
   sendMessage(message);
