@@ -4,8 +4,8 @@
 #include <concepts>
 #include <utility>
 
+#include "values/FunctionRef.h"
 #include "values/SharedString.h"
-#include "values/UniqueFunction.h"
 #include "values/Value.h"
 
 namespace tonewerk {
@@ -34,7 +34,7 @@ class Metricon {
   // is called once, before sendEvent() returns, and not at all when nobody has asked for any of the names.
   // Waits while the recorder's queue is full, unless nothing can be written (see docs/architecture.md, "Back
   // pressure").
-  virtual void sendEvent(const EventNames& names, const UniqueFunction<ValueMap()>& payload) = 0;
+  virtual void sendEvent(const EventNames& names, FunctionRef<ValueMap()> payload) = 0;
 };
 
 }  // namespace tonewerk

@@ -22,29 +22,31 @@ void StoreMetricon::readConsumersAgain() {
   isStale_ = true;
 }
 
-void StoreMetricon::sendEvent(const EventNames& names, const UniqueFunction<ValueMap()>& payload) {
-  EventNames used = usedOf(names);
-  if (used.first.empty()) return;
-  store_.recordEvent(clock_.now(), std::move(used), payload());
+void StoreMetricon::sendEvent(const EventNames& names, FunctionRef<ValueMap()> payload) {
+  std::optional<EventNames> used = usedOf(names);
+  if (used) store_.recordEvent(clock_.now(), std::move(*used), payload());
 }
 
-EventNames StoreMetricon::usedOf(const EventNames& names) {
+std::optional<EventNames> StoreMetricon::usedOf(const EventNames& names) {
   const MutexLock lock(mutex_);
   readConsumers();
   const auto known = remembered_.find(names);
-  if (known != remembered_.end()) return known->second;
+  const EventNames& used = known == remembered_.end() ? remember(names) : known->second;
+  return used.first.empty() ? std::nullopt : std::optional(used);
+}
+
+const EventNames& StoreMetricon::remember(const EventNames& names) {
   EventNames used;
   if (consumers_->wants(names.first.string())) used.first = names.first;
   if (!names.second.empty() && consumers_->wants(names.second.string())) {
     (used.first.empty() ? used.first : used.second) = names.second;
   }
   if (remembered_.size() >= kMaxRemembered) remembered_.clear();
-  remembered_.emplace(names, used);
-  return used;
+  return remembered_.emplace(names, std::move(used)).first->second;
 }
 
 void StoreMetricon::readConsumers() {
-  const std::chrono::nanoseconds now = clock_.monotonic();
+  const std::chrono::nanoseconds now = clock_.coarseMonotonic();
   if (!std::exchange(isStale_, false) && now - readAt_ < kReadInterval) return;
   readAt_ = now;
   std::optional<Value> preference = preferences_.read(kPreferenceDomain, kConsumersKey);

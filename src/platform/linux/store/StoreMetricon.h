@@ -37,15 +37,17 @@ class StoreMetricon final : public Metricon {
   // Any thread. The next event reads the preference again.
   void readConsumersAgain();
 
-  void sendEvent(const EventNames& names, const UniqueFunction<ValueMap()>& payload) override;
+  void sendEvent(const EventNames& names, FunctionRef<ValueMap()> payload) override;
 
  private:
   static constexpr std::chrono::seconds kReadInterval{1};
   // The answers for so many names are remembered. When there are more, all are forgotten.
   static constexpr std::size_t kMaxRemembered = 4096;
 
-  // The names that a consumer asks for. `first` is empty when there are none.
-  EventNames usedOf(const EventNames& names);
+  // The names that a consumer asks for, if there are any.
+  std::optional<EventNames> usedOf(const EventNames& names);
+  // Adds the answer for these names to remembered_.
+  const EventNames& remember(const EventNames& names) REQUIRES(mutex_);
   void readConsumers() REQUIRES(mutex_);
 
   ReportStore& store_;
@@ -58,7 +60,7 @@ class StoreMetricon final : public Metricon {
   std::optional<Value> preference_ GUARDED_BY(mutex_);  // consumers_ was made of this
   std::chrono::nanoseconds readAt_ GUARDED_BY(mutex_){0};
   bool isStale_ GUARDED_BY(mutex_) = true;
-  // Which of an event's names consumers_ ask for.
+  // Which of an event's names consumers_ ask for; `first` is empty when that is none.
   std::unordered_map<EventNames, EventNames, EventNamesHash> remembered_ GUARDED_BY(mutex_);
 };
 

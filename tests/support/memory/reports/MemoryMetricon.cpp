@@ -5,7 +5,7 @@
 
 namespace tonewerk {
 
-void MemoryMetricon::sendEvent(const EventNames& names, const UniqueFunction<ValueMap()>& payload) {
+void MemoryMetricon::sendEvent(const EventNames& names, FunctionRef<ValueMap()> payload) {
   std::vector<std::string> used = usedOf(names);
   if (used.empty()) return;
   const ValueMap made = payload();

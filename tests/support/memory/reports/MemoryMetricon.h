@@ -22,7 +22,7 @@ class MemoryMetricon final : public Metricon {
   };
 
   // Keeps one event for each name that is used.
-  void sendEvent(const EventNames& names, const UniqueFunction<ValueMap()>& payload) override;
+  void sendEvent(const EventNames& names, FunctionRef<ValueMap()> payload) override;
 
   // After this only events are used that match one of the glob patterns, or the predicate.
   void useOnly(std::vector<std::string> patterns);
