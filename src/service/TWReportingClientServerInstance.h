@@ -19,7 +19,7 @@
 namespace tonewerk {
 
 class TWReportingServiceDelegateProtocol;
-class ShapeTable;
+class MessageShapes;
 class TWReportingSession;
 
 // Represents a connected client process and its sessions, and carries out its requests.
@@ -81,7 +81,7 @@ class TWReportingClientServerInstance final
   const SessionMap& clientReportingSessionMap() const;
 
   // The shapes of this client's messages. The table is used on the work queue.
-  const std::shared_ptr<ShapeTable>& shapes() const { return shapes_; }
+  const std::shared_ptr<MessageShapes>& shapes() const { return shapes_; }
 
   // From now on keeps the client's sessions in `index`, under `number`. Call it once, before any request.
   void listSessionsIn(std::shared_ptr<SessionIndex> index, SessionIndex::ClientNumber number);
@@ -111,7 +111,7 @@ class TWReportingClientServerInstance final
   const std::int32_t processIdentifier_;
   const std::weak_ptr<TWReportingServiceDelegateProtocol> delegate_;
   const std::shared_ptr<KeptBytesBudget> budget_;
-  const std::shared_ptr<ShapeTable> shapes_;
+  const std::shared_ptr<MessageShapes> shapes_;
   SessionMap clientReportingSessionMap_;
   std::shared_ptr<SessionIndex> index_;  // null until the service has registered the client
   SessionIndex::ClientNumber number_ = 0;

@@ -17,6 +17,7 @@
 #include "service/TWReportingClientServerInstance.h"
 #include "service/TWReportingServiceExport.h"
 #include "service/WatchRequests.h"
+#include "session/MessageShapes.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingSession.h"

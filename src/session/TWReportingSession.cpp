@@ -13,7 +13,6 @@
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingTracePoint.h"
 #include "session/TWReportingUtility.h"
-#include "values/ShapeTable.h"
 #include "values/ValueView.h"
 
 namespace tonewerk {
@@ -33,12 +32,6 @@ const SharedString kReporterID("reporterid");
 
 std::string_view yesOrNo(bool answer) { return answer ? "YES" : "NO"; }
 
-// The value of a key that the shape of a packed map knows.
-ValueView knownValue(const ValueMap& packed, std::size_t known) {
-  const std::size_t slot = packed.shape()->known(known);
-  return slot == Shape::kNoSlot ? ValueView() : ValueView(packed.packed()->at(slot));
-}
-
 // What takes the place of a message's time.
 struct ReplacedDate {
   ValueView invalid;  // the value of "invalid_timestamp"
@@ -47,9 +40,9 @@ struct ReplacedDate {
 
 // None for a time that is neither missing nor too old.
 std::optional<ReplacedDate> replacedDate(ValueView time) {
-  const double now = TWReportingContext::current().platform().clock.now();
-  if (!time) return ReplacedDate{ValueView(kNilText), now};
-  if (time.number() < now - kOldestTimestampSeconds) return ReplacedDate{time, now};
+  const Clock& clock = TWReportingContext::current().platform().clock;
+  if (!time) return ReplacedDate{ValueView(kNilText), clock.now()};
+  if (time.number() < clock.coarseNow() - kOldestTimestampSeconds) return ReplacedDate{time, clock.now()};
   return std::nullopt;
 }
 
@@ -88,7 +81,7 @@ const TWReportingSession::LifecycleTexts TWReportingSession::LifecycleTexts::kSt
 std::shared_ptr<TWReportingSession> TWReportingSession::initWithID(ReporterID reporterID,
                                                                    ProcessIdentifiers processIdentifiers,
                                                                    std::shared_ptr<KeptBytesBudget> budget,
-                                                                   std::shared_ptr<ShapeTable> shapes) {
+                                                                   std::shared_ptr<MessageShapes> shapes) {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto& registry = TWReportingContext::current().workerRegistry();
   if (budget == nullptr) budget = std::make_shared<KeptBytesBudget>();
@@ -102,7 +95,7 @@ std::shared_ptr<TWReportingSession> TWReportingSession::initWithID(ReporterID re
 
 TWReportingSession::TWReportingSession(Private, ReporterID reporterID, ProcessIdentifiers processIdentifiers,
                                        std::shared_ptr<KeptBytesBudget> budget,
-                                       std::shared_ptr<ShapeTable> shapes)
+                                       std::shared_ptr<MessageShapes> shapes)
     : reporterID_(reporterID),
       processIdentifiers_(std::move(processIdentifiers)),
       budget_(std::move(budget)),
@@ -282,6 +275,7 @@ void TWReportingSession::sendMessage(TWReportingSessionMessage& message, const M
 }
 
 void TWReportingSession::deliver(const TWReportingSessionMessage& message) {
+  const LogCategory* debug = debugCategory();
   // By index, because a worker that sends or starts the session may add consumers.
   for (std::size_t at = 0; at < consumers_.size(); ++at) {
     const Consumer consumer = consumers_[at];
@@ -290,8 +284,8 @@ void TWReportingSession::deliver(const TWReportingSessionMessage& message) {
     const TWReportingSessionWorkerClass& workerClass = *consumer.workerClass;
     if (!message.destinationWorkers.empty() && !contains(message.destinationWorkers, workerClass)) continue;
     if (workerClass.handledTypes.contains(message.type)) consumer.worker->handleMessage(message);
-    debugLog(TWReportingSessionCategory(),
-             "TWReportingSessionWorker action=handleMessage worker=%@ reporterID=%lli", workerClass,
+    if (debug == nullptr) continue;
+    debugLog(debug, "TWReportingSessionWorker action=handleMessage worker=%@ reporterID=%lli", workerClass,
              reporterID_);
   }
 }
@@ -388,7 +382,7 @@ bool TWReportingSession::completePacked(TWReportingSessionMessage& message) cons
   // A shape of another client does not know these keys.
   if (shape == nullptr || shapes_ == nullptr || !shapes_->owns(*shape) || shape->hasKeyWithSpace())
     return false;
-  if (const auto replaced = replacedDate(knownValue(message.message, kKnownTimestamp))) {
+  if (const auto replaced = replacedDate(knownValue(message.message, KnownKey::kTimestamp))) {
     const Value now = replaced->now;
     if (!message.message.setPacked({{TWReportingInternalEventInvalidTimestamp, replaced->invalid},
                                     {TWReportingInternalEventEpochTime, now}},
@@ -398,13 +392,10 @@ bool TWReportingSession::completePacked(TWReportingSessionMessage& message) cons
     shape = message.message.shape();
   }
   const std::lock_guard lock(message);
-  const ValueMapEntry tag{TWReportingInternalEventAudioTag,
-                          TWReportingContext::current().names().audioTag(message.category, message.type)};
-  const ValueView name = knownValue(message.message, kKnownApplicationName);
+  const ValueView name = knownValue(message.message, KnownKey::kApplicationName);
+  const bool isNamed = name && !(name == ValueView(kUnknownName));
   const Shape* complete =
-      name && !(name == ValueView(kUnknownName))
-          ? shapes_->extended(*shape, {tag})
-          : shapes_->extended(*shape, {tag, {TWReportingApplicationName, applicationName_}});
+      shapes_->completed(*shape, message.category, message.type, isNamed ? nullptr : &applicationName_);
   return complete != nullptr && message.message.extend(*complete);
 }
 

@@ -24,7 +24,7 @@
 namespace tonewerk {
 
 class LogCategory;
-class ShapeTable;
+class MessageShapes;
 
 // Represents one reporting session of one client, with its stored messages and its workers.
 //
@@ -51,10 +51,10 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   static std::shared_ptr<TWReportingSession> initWithID(ReporterID reporterID,
                                                         ProcessIdentifiers processIdentifiers,
                                                         std::shared_ptr<KeptBytesBudget> budget = nullptr,
-                                                        std::shared_ptr<ShapeTable> shapes = nullptr);
+                                                        std::shared_ptr<MessageShapes> shapes = nullptr);
 
   TWReportingSession(Private, ReporterID reporterID, ProcessIdentifiers processIdentifiers,
-                     std::shared_ptr<KeptBytesBudget> budget, std::shared_ptr<ShapeTable> shapes);
+                     std::shared_ptr<KeptBytesBudget> budget, std::shared_ptr<MessageShapes> shapes);
   TWReportingSession(const TWReportingSession&) = delete;
   TWReportingSession& operator=(const TWReportingSession&) = delete;
   ~TWReportingSession();
@@ -118,7 +118,7 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   // given up but that may live on.
   void leaveBudget();
   // Null when the session has none.
-  ShapeTable* shapes() const { return shapes_.get(); }
+  MessageShapes* shapes() const { return shapes_.get(); }
   // The stored messages, without redundant ones, in order of arrival; sorted by time while the session stops.
   const KeptMessages& messages() const { return messages_; }
   // How many messages were received since the session was made or last stopped, and how many were redundant.
@@ -191,7 +191,7 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   const ReporterID reporterID_;
   const ProcessIdentifiers processIdentifiers_;
   std::shared_ptr<KeptBytesBudget> budget_;
-  const std::shared_ptr<ShapeTable> shapes_;
+  const std::shared_ptr<MessageShapes> shapes_;
   AudioServiceType serviceType_ = kServiceUnknown;
   std::string serviceName_;
   bool started_ = false;

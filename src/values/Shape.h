@@ -30,10 +30,12 @@ class Shape {
   static constexpr std::size_t kMaxKnownKeys = 8;
   using KnownKeys = std::span<const SharedString>;
 
-  // Where a shape is interned: in which table, and under which number.
+  // Where a shape is interned: in which table, and under which number; and which keys it knows, as the maker
+  // of the table numbers such sets (0 for a set without a number).
   struct Origin {
     std::uint64_t table = 0;
     std::uint32_t number = 0;
+    std::uint32_t knownSet = 0;
   };
 
   // Makes the shape of `keys`. `known` are the keys whose slots known() returns, at most kMaxKnownKeys.

@@ -84,8 +84,8 @@ void ShapeTable::Index::insert(Entry entry) {
   entries_[at] = entry;
 }
 
-ShapeTable::ShapeTable(std::vector<SharedString> known)
-    : identifier_(newIdentifier()), known_(std::move(known)), nodes_(1) {}
+ShapeTable::ShapeTable(std::vector<SharedString> known, std::uint32_t knownSet)
+    : identifier_(newIdentifier()), known_(std::move(known)), knownSet_(knownSet), nodes_(1) {}
 
 ShapeTable::Place ShapeTable::probe(Place from, std::string_view key) {
   const auto parent = static_cast<std::uint32_t>(from);

@@ -42,8 +42,9 @@ class ShapeTable {
   // A place in the tree: the keys on the way to it are the beginning of a sequence.
   enum class Place : std::uint32_t {};
 
-  // The shapes know the slots of the keys `known`, at most Shape::kMaxKnownKeys.
-  explicit ShapeTable(std::vector<SharedString> known = {});
+  // The shapes know the slots of the keys `known`, at most Shape::kMaxKnownKeys. Tables with the same keys may
+  // number them, so that shapes of any of these tables are recognised by Shape::Origin::knownSet.
+  explicit ShapeTable(std::vector<SharedString> known = {}, std::uint32_t knownSet = 0);
   ShapeTable(const ShapeTable&) = delete;
   ShapeTable& operator=(const ShapeTable&) = delete;
 
@@ -140,7 +141,9 @@ class ShapeTable {
   const Shape* makeShape(Place place);
   const Shape* makeExtended(const Shape& shape, std::span<const ValueMapEntry> constants, std::size_t hash);
   // Where the next new shape is interned.
-  Shape::Origin nextOrigin() const { return {identifier_, static_cast<std::uint32_t>(shapes_.size() + 1)}; }
+  Shape::Origin nextOrigin() const {
+    return {identifier_, static_cast<std::uint32_t>(shapes_.size() + 1), knownSet_};
+  }
   const Shape* intern(Interned interned);
   // None for a shape of another table.
   Interned* internedOf(const Shape& shape) {
@@ -149,6 +152,7 @@ class ShapeTable {
 
   const std::uint64_t identifier_;
   const std::vector<SharedString> known_;
+  const std::uint32_t knownSet_;
   std::vector<Node> nodes_;
   Index nodesByKey_;
   std::vector<Interned> shapes_;  // in the order of their numbers, from 1

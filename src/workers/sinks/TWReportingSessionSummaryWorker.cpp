@@ -9,6 +9,7 @@
 #include "platform/Log.h"
 #include "platform/ProcessInformation.h"
 #include "platform/SystemInformation.h"
+#include "session/MessageShapes.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingSession.h"
@@ -71,12 +72,12 @@ const TWReportingSessionWorkerClass TWReportingSessionSummaryWorker::kWorkerClas
 
 bool TWReportingSessionSummaryWorker::handleMessage(const TWReportingSessionMessage& message) {
   assert(TWReportingUtilityIsOnReportingServerQueue());
-  if (const ValueView duration = message.message.view(TWReportingMessageKeySessionDuration)) {
+  if (const ValueView duration = knownValue(message.message, KnownKey::kSessionDuration)) {
     totalActiveTime_ += duration.number();
     ++activeCount_;
     return false;
   }
-  const ValueView issueType = message.message.view(TWReportingMessageKeyIssueType);
+  const ValueView issueType = knownValue(message.message, KnownKey::kIssueType);
   if (issueType && issueType == ValueView(kOverload)) ++overloadCount_;
   return false;
 }
