@@ -42,8 +42,8 @@ class ShapeTable {
   // A place in the tree: the keys on the way to it are the beginning of a sequence.
   enum class Place : std::uint32_t {};
 
-  // The shapes know the slots of the keys `known`, at most Shape::kMaxKnownKeys. Tables with the same keys may
-  // number them, so that shapes of any of these tables are recognised by Shape::Origin::knownSet.
+  // The shapes know the slots of the keys `known`, at most Shape::kMaxKnownKeys. Tables with the same keys
+  // may number them, so that shapes of any of these tables are recognised by Shape::Origin::knownSet.
   explicit ShapeTable(std::vector<SharedString> known = {}, std::uint32_t knownSet = 0);
   ShapeTable(const ShapeTable&) = delete;
   ShapeTable& operator=(const ShapeTable&) = delete;

@@ -79,7 +79,8 @@ class Deliveries {
   std::vector<Call> calls_ GUARDED_BY(mutex_);
 };
 
-// Keeps what it receives until the test delivers it. Requests of "fail" are urgent, those of "takeInt64" quick.
+// Keeps what it receives until the test delivers it. Requests of "fail" are urgent, those of "takeInt64"
+// quick.
 class LateHandler final : public RequestHandler {
  public:
   explicit LateHandler(Deliveries& deliveries) : deliveries_(deliveries) {}
