@@ -5,7 +5,7 @@
 #include <cstdint>
 #include <map>
 #include <memory>
-#include <unordered_map>
+#include <vector>
 
 #include "protocol/AudioEvent.h"
 #include "values/Mix.h"
@@ -32,22 +32,30 @@ class SessionIndex {
   Session find(ReporterID reporterID) const;
 
  private:
-  // The sessions with one identifier. There is mostly only one.
-  struct Holders {
-    ClientNumber firstClient;
-    Session first;
-    std::map<ClientNumber, Session> others;  // of clients that connected later
+  // A session that is found; null in a free place.
+  struct Place {
+    ReporterID reporterID = 0;
+    ClientNumber client = 0;
+    Session session;
   };
-  // Clients choose the identifiers, and could choose ones that collide under a known hash.
-  struct SeededHash {
-    SeededHash() : seed(randomKey()) {}
-    std::size_t operator()(ReporterID reporterID) const {
-      return mix(static_cast<std::uint64_t>(reporterID) ^ seed, 0x9E3779B97F4A7C15U);
-    }
-    std::uint64_t seed;
-  };
+  static constexpr std::size_t kFewestPlaces = 16;
 
-  std::unordered_map<ReporterID, Holders, SeededHash> sessions_;
+  // The place at which a search for the identifier begins. Clients choose the identifiers, and could choose
+  // ones that collide under a known hash.
+  std::size_t homeOf(ReporterID reporterID) const {
+    return mix(static_cast<std::uint64_t>(reporterID) ^ seed_, 0x9E3779B97F4A7C15U) & (places_.size() - 1);
+  }
+  // The number of the identifier's place, or of the free one where it belongs.
+  std::size_t placeOf(ReporterID reporterID) const;
+  void resize(std::size_t places);
+  void free(std::size_t place);
+
+  // A hash table with linear probing, at most half full, so that a look-up waits for memory once.
+  std::vector<Place> places_ = std::vector<Place>(kFewestPlaces);
+  std::size_t used_ = 0;
+  const std::uint64_t seed_ = randomKey();
+  // The sessions that are not found, because a client that connected earlier has one with that identifier.
+  std::map<ReporterID, std::map<ClientNumber, Session>> others_;
 };
 
 }  // namespace tonewerk

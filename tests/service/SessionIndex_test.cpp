@@ -79,5 +79,28 @@ TEST_F(SessionIndexTest, AgreesWithAWalkOverTheClients) {
   }
 }
 
+// So that the index grows, shrinks, and closes gaps between identifiers that share places.
+TEST_F(SessionIndexTest, AgreesWithAMapOfManyIdentifiersThatComeAndGo) {
+  constexpr ReporterID kIdentifiers = 600;
+  std::mt19937 random(11);
+  std::map<ReporterID, SessionIndex::Session> sessions;
+  for (const double share : {0.9, 0.02, 0.5, 0.0}) {
+    for (ReporterID step = 0; step < 3 * kIdentifiers; ++step) {
+      const ReporterID reporterID = random() % kIdentifiers;
+      if (std::bernoulli_distribution(share)(random)) {
+        sessions[reporterID] = make(reporterID);
+        index.set(reporterID, 1, sessions[reporterID]);
+      } else {
+        sessions.erase(reporterID);
+        index.remove(reporterID, 1);
+      }
+    }
+    for (ReporterID wanted = 0; wanted < kIdentifiers; ++wanted) {
+      const auto found = sessions.find(wanted);
+      ASSERT_EQ(index.find(wanted), found == sessions.end() ? nullptr : found->second) << wanted;
+    }
+  }
+}
+
 }  // namespace
 }  // namespace tonewerk
