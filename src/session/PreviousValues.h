@@ -7,6 +7,7 @@
 
 #include "session/KeptBytesBudget.h"
 #include "values/Counted.h"
+#include "values/Prefetch.h"
 #include "values/Value.h"
 
 namespace tonewerk {
@@ -33,6 +34,11 @@ class PreviousValues {
 
   // The bytes that are taken from the budget.
   std::size_t bytes() const { return merged_.bytes() + keptBytes_; }
+
+  // Asks the processor for the memory that add() reads.
+  void prefetchShapes() const {
+    for (const Latest& latest : latest_) prefetch(&latest);
+  }
 
  private:
   struct Latest {

@@ -13,15 +13,13 @@
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingTracePoint.h"
 #include "session/TWReportingUtility.h"
+#include "values/Prefetch.h"
 #include "values/ValueView.h"
 
 namespace tonewerk {
 namespace {
 
 constexpr double kOldestTimestampSeconds = 31'536'000.0;  // 365 days
-
-// An upper bound of the bytes that the index of newest messages takes for a category and type.
-constexpr std::size_t kKindBytes = 96;
 
 const Value kUnknownName("Unknown");
 const Value kNilText("nil");
@@ -245,8 +243,16 @@ void TWReportingSession::forEachWorker(Order order, Visitor visit) {
   }
 }
 
+// With many sessions none of this is in a cache, and each piece would be waited for when it is used.
+void TWReportingSession::prefetchForMessage() const {
+  newest_.prefetchKinds();
+  previousValues_.prefetchShapes();
+  for (const Consumer& consumer : consumers_) prefetch(consumer.worker);
+}
+
 void TWReportingSession::sendMessage(TWReportingSessionMessage& message, const MessageReply& reply) {
   assert(TWReportingUtilityIsOnReportingServerQueue());
+  prefetchForMessage();
   ++totalMessageCount_;
   if (!completePacked(message)) {
     addMissingDates(message);
@@ -299,7 +305,7 @@ void TWReportingSession::stop() {
   debugLog(TWReportingSessionCategory(), "ending session. reporterID=%lli", reporterID_);
   emitTracePoint(TWReportingTracePoint::kSessionEnding);
   if (messages_.sortByTime()) {
-    for (const auto* message : messages_) newest_[{message->category, message->type}] = message;
+    for (const auto* message : messages_) newest_.set({message->category, message->type}, message);
   }
 
   const LogCategory* debug = debugCategory();
@@ -338,16 +344,17 @@ std::shared_ptr<TWReportingSessionMessage> TWReportingSession::lifecycleMessage(
 }
 
 const TWReportingSessionMessage* TWReportingSession::store(const TWReportingSessionMessage& message) {
-  const auto [newest, isNewKind] = newest_.try_emplace({message.category, message.type});
-  const std::size_t bytes = messages_.bytesFor(message) + (isNewKind ? kKindBytes : 0);
+  const NewestMessages::Kind kind{message.category, message.type};
+  const bool isNewKind = newest_.find(kind) == nullptr;
+  const std::size_t bytes = messages_.bytesFor(message) + (isNewKind ? NewestMessages::kKindBytes : 0);
   if (!budget_->take(bytes)) {
-    if (isNewKind) newest_.erase(newest);
     logFullBudgetOnce();
     return nullptr;
   }
   messageBytes_ += bytes;
-  newest->second = &messages_.add(message);
-  return newest->second;
+  const TWReportingSessionMessage* stored = &messages_.add(message);
+  newest_.set(kind, stored);
+  return stored;
 }
 
 void TWReportingSession::logFullBudgetOnce() {
@@ -436,11 +443,11 @@ void TWReportingSession::addAppName(TWReportingSessionMessage& message) const {
 bool TWReportingSession::messageIsRedundant(const TWReportingSessionMessage& message) const {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   if (message.type == kTypeError || message.category == kCategoryError) return false;
-  const auto earlier = newest_.find({message.category, message.type});
-  if (earlier == newest_.end()) return false;
+  const TWReportingSessionMessage* earlier = newest_.find({message.category, message.type});
+  if (earlier == nullptr) return false;
   const bool isRepeated = message.message.equalsIgnoring(
-      earlier->second->message, {TWReportingInternalEventProcessUptimeMS,
-                                 TWReportingInternalEventSystemUptimeSec, TWReportingInternalEventEpochTime});
+      earlier->message, {TWReportingInternalEventProcessUptimeMS, TWReportingInternalEventSystemUptimeSec,
+                         TWReportingInternalEventEpochTime});
   if (isRepeated) debugLog(TWReportingSessionCategory(), "marking event redundant");
   return isRepeated;
 }

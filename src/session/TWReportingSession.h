@@ -4,7 +4,6 @@
 #include <chrono>
 #include <cstdint>
 #include <functional>
-#include <map>
 #include <memory>
 #include <optional>
 #include <string>
@@ -15,6 +14,7 @@
 #include "protocol/RequestSet.h"
 #include "session/KeptBytesBudget.h"
 #include "session/KeptMessages.h"
+#include "session/NewestMessages.h"
 #include "session/PreviousValues.h"
 #include "session/TWReportingSessionMessage.h"
 #include "session/TWReportingSessionWorkerClass.h"
@@ -179,6 +179,9 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   void forEachWorker(Order order, Visitor visit) NO_THREAD_SAFETY_ANALYSIS;
   // The workers whose class has `role`.
   Workers workersWith(bool TWReportingSessionWorkerClass::*role) const;
+  // Asks the processor for the memory that sendMessage() uses. Reads where it is without the lock, because
+  // only the work queue writes that.
+  void prefetchForMessage() const NO_THREAD_SAFETY_ANALYSIS;
   void deliver(const TWReportingSessionMessage& message);
   // The bytes that the session has taken from the budget.
   std::size_t keptBytes() const;
@@ -201,10 +204,7 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   std::optional<std::chrono::nanoseconds> startedAt_;
 
   KeptMessages messages_;
-  // The newest stored message of each category and type. An ordered map, because clients choose the keys
-  // and could choose ones that collide in a hash table.
-  using Kind = std::pair<AudioEventCategory, AudioEventType>;
-  std::map<Kind, const TWReportingSessionMessage*> newest_;
+  NewestMessages newest_;
   std::size_t messageBytes_ = 0;          // taken from the budget for messages_
   std::uint64_t unkeptMessageCount_ = 0;  // delivered but not stored for lack of room, and not logged yet
   std::vector<Consumer> consumers_;       // in the order of consumingMessageWorkers(); workers_ owns them
