@@ -2,11 +2,13 @@
 #include "platform/linux/messagepack/RpcFrameScanner.h"
 
 #include <algorithm>
+#include <cstddef>
 #include <limits>
 #include <optional>
 #include <type_traits>
 #include <utility>
 
+#include "values/Bytes.h"
 #include "values/EncodedValue.h"
 #include "values/Utf8.h"
 
@@ -19,6 +21,9 @@ constexpr std::uint64_t kNotification = 2;
 
 // The frame's own array and that of the arguments.
 constexpr std::size_t kArgumentsDepth = 2;
+
+// The start of a frame and its kind, a number of 32 bits, a text of 31 bytes, the start of the arguments.
+constexpr std::size_t kUsualHeadBytes = 2 + 5 + 32 + 1;
 
 }  // namespace
 
@@ -49,6 +54,72 @@ struct RpcFrameScanner::Header {
 
 namespace {
 
+// Goes over values of which nearly all are numbers and short texts. Far from the end of the bytes these need not
+// be compared with it.
+class ShortValues {
+ public:
+  ShortValues(std::string_view bytes, std::size_t at)
+      : begin_(bytes.data()),
+        at_(begin_ + at),
+        limit_(begin_ + bytes.size() - std::min(bytes.size(), kRoomBytes)) {}
+
+  // The offset of the next value.
+  std::size_t at() const { return static_cast<std::size_t>(at_ - begin_); }
+
+  // Goes behind the next value, an array or a map included that holds none. False at other values than texts of
+  // up to 255 bytes and those whose first byte says how long they are, and near the end of the bytes.
+  bool skipArgument() {
+    if (at_ >= limit_) return false;
+    const std::uint8_t first = encoding::byteAt(at_);
+    if ((first & 0xE0U) != encoding::kFixedMap && first < encoding::kArray16) return skip();
+    const encoding::Extent extent = encoding::extentAt(at_);
+    const bool isMap = encoding::isMap(first);
+    if (!isMap && !encoding::isArray(first)) return skip();
+    at_ += extent.header;
+    return isMap ? skipEntries(extent.count) : skipElements(extent.count);
+  }
+
+ private:
+  // Two values whose first byte says how long they are, and the header of any.
+  static constexpr std::size_t kRoomBytes =
+      2 * *std::max_element(encoding::kFixedLengths.begin(), encoding::kFixedLengths.end());
+
+  bool skipEntries(std::size_t count) {
+    for (; count > 0; --count) {
+      if (at_ >= limit_) return false;
+      const std::size_t key = encoding::kFixedLengths[encoding::byteAt(at_)];
+      const std::size_t value = encoding::kFixedLengths[encoding::byteAt(at_ + key)];
+      if (key != 0 && value != 0) {
+        at_ += key + value;
+      } else if (!skip() || !skip()) {
+        return false;
+      }
+    }
+    return true;
+  }
+
+  bool skipElements(std::size_t count) {
+    for (; count > 0; --count) {
+      if (!skip()) return false;
+    }
+    return true;
+  }
+
+  bool skip() {
+    if (at_ >= limit_) return false;
+    const std::uint8_t first = encoding::byteAt(at_);
+    std::size_t length = encoding::kFixedLengths[first];
+    if (first == encoding::kText8) length = 2 + std::size_t{encoding::byteAt(at_ + 1)};
+    if (length == 0 || length > static_cast<std::size_t>(limit_ - at_)) return false;
+    at_ += length;
+    return true;
+  }
+
+  const char* const begin_;
+  const char* at_;
+  const char* const limit_;  // from here on a value is near the end
+};
+
 // The value of an integer that is not negative. `bytes` begin with a whole number or boolean, or with
 // something else.
 std::optional<std::uint64_t> naturalAt(const char* bytes) {
@@ -68,10 +139,64 @@ std::optional<std::uint64_t> naturalAt(const char* bytes) {
 RpcFrameScanner::Result RpcFrameScanner::scan(std::string_view bytes) {
   if (!problem_.empty()) return Result::kBroken;
   if (at_ == 0) {
-    const Result head = scanHead(bytes);
+    const Result head = scanUsualHead(bytes) ? Result::kFrame : scanHead(bytes);
     if (head != Result::kFrame) return head;
+    if (scanUsualArguments(bytes)) return endFrame(bytes);
   }
   return scanArguments(bytes);
+}
+
+// Finds the end of usual arguments: few, of which maps and arrays hold only numbers and short texts. All others
+// and those near the end of the bytes are left to scanArguments(), which begins anew; so nothing is read more
+// than twice.
+bool RpcFrameScanner::scanUsualArguments(std::string_view bytes) {
+  const std::size_t count = frame_.argumentCount;
+  if (count > kMaxKnownArguments) return false;
+  ShortValues values(bytes, at_);
+  for (std::size_t index = 0; index < count; ++index) {
+    frame_.arguments[index] = static_cast<std::uint32_t>(values.at());
+    if (!values.skipArgument()) return false;
+  }
+  at_ = values.at();
+  return true;
+}
+
+// Reads the head of a request or a notification as clients usually write it, and leaves all others to scanHead().
+// With so many bytes it need not ask whether each part has arrived.
+bool RpcFrameScanner::scanUsualHead(std::string_view bytes) {
+  if (bytes.size() < kUsualHeadBytes) return false;
+  const char* at = bytes.data();
+  const bool isRequest = encoding::byteAt(at) == encoding::kFixedArray + 4;
+  const auto kind = static_cast<std::uint8_t>(isRequest ? kRequest : kNotification);
+  if ((!isRequest && encoding::byteAt(at) != encoding::kFixedArray + 3) || encoding::byteAt(at + 1) != kind) {
+    return false;
+  }
+  at += 2;
+  std::uint32_t identifier = 0;
+  if (isRequest) {
+    const std::uint8_t first = encoding::byteAt(at);
+    if (first == encoding::kUnsigned32) {
+      identifier = bigEndianAt<std::uint32_t>(at + 1);
+    } else if (first == encoding::kUnsigned16) {
+      identifier = bigEndianAt<std::uint16_t>(at + 1);
+    } else if (first < encoding::kFixedMap) {
+      identifier = first;
+    } else {
+      return false;
+    }
+    at += encoding::kFixedLengths[first];
+  }
+  const std::string_view method(at + 1, encoding::byteAt(at) & 0x1FU);
+  const char* const arguments = method.data() + method.size();
+  const bool isUsual = (encoding::byteAt(at) & 0xE0U) == encoding::kFixedText && isAscii(method) &&
+                       (encoding::byteAt(arguments) & 0xF0U) == encoding::kFixedArray;
+  if (!isUsual) return false;
+  frame_.isNotification = !isRequest;
+  if (isRequest) frame_.identifier = identifier;
+  methodAt_ = static_cast<std::size_t>(method.data() - bytes.data());
+  methodBytes_ = method.size();
+  startArguments(methodAt_ + methodBytes_ + 1, encoding::byteAt(arguments) & 0x0FU);
+  return true;
 }
 
 // Reads the head anew each time until it is complete, which takes the same time however much has arrived.
@@ -121,11 +246,15 @@ RpcFrameScanner::Result RpcFrameScanner::scanHead(std::string_view bytes) {
   }
   methodAt_ = methodAt;
   methodBytes_ = method->bodyBytes;
-  at_ = at + arguments->bytes;
-  depth_ = kArgumentsDepth;
-  missing_[depth_] = arguments->count;
-  frame_.argumentCount = arguments->count;
+  startArguments(at + arguments->bytes, arguments->count);
   return Result::kFrame;
+}
+
+void RpcFrameScanner::startArguments(std::size_t at, std::size_t count) {
+  at_ = at;
+  depth_ = kArgumentsDepth;
+  missing_[depth_] = count;
+  frame_.argumentCount = count;
 }
 
 RpcFrameScanner::Result RpcFrameScanner::scanArguments(std::string_view bytes) {

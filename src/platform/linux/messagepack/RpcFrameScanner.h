@@ -50,6 +50,9 @@ class RpcFrameScanner {
   struct Header;
 
   [[nodiscard]] Result scanHead(std::string_view bytes);
+  [[nodiscard]] bool scanUsualHead(std::string_view bytes);
+  [[nodiscard]] bool scanUsualArguments(std::string_view bytes);
+  void startArguments(std::size_t at, std::size_t count);
   void noteArgument();
   void skipShortValues(std::string_view bytes);
   [[nodiscard]] Result scanArguments(std::string_view bytes);

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/messagepack/RpcFrameScanner.h"
 
+#include <algorithm>
+#include <array>
 #include <gmock/gmock.h>
 #include <random>
 #include <string>
@@ -230,6 +232,50 @@ TEST(RpcFrameScannerTest, FindsTheFramesThatTheReaderReads) {
   }
   EXPECT_GT(readable, 5'000U);
   EXPECT_GT(earlyRefusals, 20);
+}
+
+TEST(RpcFrameScannerTest, FindsTheSameInAWholeReadAsByteByByte) {
+  constexpr std::uint64_t kSeed = 20261123;
+  RandomFrames frames(kSeed);
+  std::array<int, 3> results{};
+  for (int round = 0; round < 500; ++round) {
+    const std::string bytes = frames.next() + frames.next() + std::string(300, '\x07');
+    RpcFrameScanner whole;
+    RpcFrameScanner slow;
+    const Result result = whole.scan(bytes);
+    Result expected = Result::kNeedsMore;
+    for (std::size_t size = 0; size <= bytes.size() && expected == Result::kNeedsMore; ++size) {
+      expected = slow.scan(std::string_view(bytes).substr(0, size));
+    }
+    ASSERT_EQ(static_cast<int>(result), static_cast<int>(expected)) << "seed " << kSeed << " round " << round;
+    ASSERT_EQ(whole.problem(), slow.problem());
+    ++results.at(static_cast<std::size_t>(result));
+    if (result != Result::kFrame) continue;
+    const RpcFrameScanner::Frame& frame = whole.frame();
+    ASSERT_EQ(frame.bytes, slow.frame().bytes);
+    ASSERT_EQ(frame.isNotification, slow.frame().isNotification);
+    if (!frame.isNotification) ASSERT_EQ(frame.identifier, slow.frame().identifier);
+    ASSERT_EQ(frame.method.size(), slow.frame().method.size());
+    ASSERT_EQ(frame.argumentCount, slow.frame().argumentCount);
+    for (std::size_t at = 0; at < std::min(frame.argumentCount, RpcFrameScanner::kMaxKnownArguments); ++at) {
+      ASSERT_EQ(frame.arguments.at(at), slow.frame().arguments.at(at)) << "round " << round;
+    }
+  }
+  EXPECT_GT(results.at(static_cast<std::size_t>(Result::kFrame)), 100);
+  EXPECT_GT(results.at(static_cast<std::size_t>(Result::kBroken)), 30);
+}
+
+// A text whose length takes a byte, and which ends behind the last byte, must not be taken for a whole one.
+TEST(RpcFrameScannerTest, WaitsForTheEndOfATextAtTheEndOfTheBytes) {
+  for (const std::size_t missing : {1U, 100U, 199U}) {
+    const std::string head = requestWith("92 81 A1 61 D9 C8");
+    const std::string bytes = head + std::string(200, 'x') + fromHex("07");
+    RpcFrameScanner scanner;
+    ASSERT_EQ(scanner.scan(std::string_view(bytes).substr(0, bytes.size() - 1 - missing)),
+              Result::kNeedsMore);
+    ASSERT_EQ(scanner.scan(bytes), Result::kFrame) << missing;
+    EXPECT_EQ(scanner.frame().bytes, bytes.size());
+  }
 }
 
 }  // namespace
