@@ -87,13 +87,27 @@ void ShapeTable::Index::insert(Entry entry) {
 ShapeTable::ShapeTable(std::vector<SharedString> known, std::uint32_t knownSet)
     : identifier_(newIdentifier()), known_(std::move(known)), knownSet_(knownSet), nodes_(1) {}
 
-ShapeTable::Place ShapeTable::probe(Place from, std::string_view key) {
+std::size_t ShapeTable::walkUnexpected(Place& place, std::string_view bytes) {
+  if (bytes.size() < kRecentBytes) return 0;
+  const std::uint16_t recent = recentAt(place, bytes.data());
+  const Node& node = nodes_[recent];
+  if (node.parent != static_cast<std::uint32_t>(place) || !node.isEncodedAt(bytes)) return 0;
+  at(place).guess = recent;
+  place = Place{recent};
+  return node.encodedSize;
+}
+
+ShapeTable::Place ShapeTable::find(Place from, std::string_view key) {
+  const std::uint32_t guess = at(from).guess;
+  if (guess != 0 && nodes_[guess].key == key) return Place{guess};
   const auto parent = static_cast<std::uint32_t>(from);
   const std::uint32_t found = nodesByKey_.find(
       hashOf(parent, SharedString::hashOf(key)),
-      [&](std::uint32_t node) { return nodes_[node].parent == parent && nodes_[node].text == key; });
+      [&](std::uint32_t node) { return nodes_[node].parent == parent && nodes_[node].key == key; });
   if (found == 0) return none();
   at(from).guess = found;
+  const Node& node = nodes_[found];
+  if (node.encodedSize != 0) recentAt(from, node.encoded.data()) = static_cast<std::uint16_t>(found);
   return Place{found};
 }
 
@@ -105,9 +119,13 @@ ShapeTable::Place ShapeTable::add(Place from, std::string_view key) {
   const auto number = static_cast<std::uint32_t>(nodes_.size());
   Node node;
   node.key = SharedString(key);
-  node.text = node.key.view();
+  if (key.size() < kMaxEncodedKey) {
+    node.encoded[0] = static_cast<char>(encoding::kFixedText + key.size());
+    copyBytes(node.encoded.data() + 1, key.data(), key.size());
+    node.encodedSize = static_cast<std::uint8_t>(1 + key.size());
+  }
   node.parent = parent;
-  node.depth = at(from).depth + 1;
+  node.depth = static_cast<std::uint16_t>(at(from).depth + 1);
   nodesByKey_.add(hashOf(parent, node.key.hash()), number);
   nodes_.push_back(std::move(node));
   at(from).guess = number;

@@ -1,12 +1,15 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <array>
 #include <cstddef>
 #include <cstdint>
+#include <limits>
 #include <span>
 #include <string_view>
 #include <vector>
 
+#include "values/Bytes.h"
 #include "values/Shape.h"
 #include "values/SharedString.h"
 #include "values/Value.h"
@@ -20,8 +23,9 @@ namespace tonewerk {
 //   root() -- next("time") -- next("level") -- shapeAt()  {"time": ..., "level": ...}
 //                                           -- next("device") -- shapeAt()
 //
-// A walk expects the key that came next last time, so for a repeated message each key costs one comparison;
-// any other costs a hash probe, however many keys may follow.
+// A walk expects the key that came next last time, so for a repeated message each key costs one comparison,
+// and where messages of a few kinds part, two. Any other key costs a hash probe, however many keys may
+// follow.
 //
 // It forgets nothing, and answers "none" to what is new and beyond a limit; it still finds the rest. So make
 // one for each client. One thread; its shapes may live longer, and on any thread.
@@ -51,15 +55,19 @@ class ShapeTable {
   static constexpr Place root() { return Place{0}; }
   static constexpr Place none() { return Place{static_cast<std::uint32_t>(-1)}; }
 
-  // Returns the place after `key`, or none() when it is new.
-  Place find(Place from, std::string_view key) {
-    const std::uint32_t guess = at(from).guess;
-    if (guess != 0) {
-      const std::string_view text = nodes_[guess].text;
-      if (text.size() == key.size() && sameBytes(text.data(), key.data(), key.size())) return Place{guess};
-    }
-    return probe(from, key);
+  // Goes from `place` to the place after the key with which `bytes` begin in MessagePack's shortest form.
+  // Returns how many bytes that takes. It knows keys of up to 31 bytes that came here lately: the last one,
+  // and usually some others of at least 3 bytes. Returns 0, and stays, for other keys; find() may know them.
+  std::size_t walk(Place& place, std::string_view bytes) {
+    const Node* const nodes = nodes_.data();
+    const std::uint32_t next = nodes[static_cast<std::size_t>(place)].guess;
+    if (!nodes[next].isEncodedAt(bytes)) return walkUnexpected(place, bytes);
+    place = Place{next};
+    return nodes[next].encodedSize;
   }
+
+  // Returns the place after `key`, or none() when it is new.
+  Place find(Place from, std::string_view key);
   // Adds a key that is new. Returns none() at a limit.
   Place add(Place from, std::string_view key);
   // Finds or adds.
@@ -94,16 +102,38 @@ class ShapeTable {
 
  private:
   static constexpr std::uint32_t kNoNode = static_cast<std::uint32_t>(-1);
+  // A key of up to 31 bytes takes one more for its header.
+  static constexpr std::size_t kMaxEncodedKey = 32;
+  static constexpr std::size_t kRecentBytes = 4;
+  static constexpr int kRecentBits = 7;
+  static constexpr std::uint64_t kRecentFactor = 0x9E3779B97F4A7C15U;
 
+  // Fills a line of the cache.
   struct Node {
-    std::string_view text;    // of `key`
-    std::uint32_t guess = 0;  // the node that a walk from here went to last; 0 for none
+    std::array<char, kMaxEncodedKey> encoded{};  // the key, if it is short
+    std::uint8_t encodedSize = 0;                // 0 for a long key and for the root
+    bool isRefused = false;                      // its shape has no room, and never will have
+    std::uint16_t depth = 0;
+    std::uint32_t guess = 0;  // the node that a walk from here went to last; 0, the root, for none
     std::uint32_t parent = 0;
-    std::uint32_t depth = 0;
-    bool isRefused = false;  // its shape has no room, and never will have
     SharedString key;
     Counted<const Shape> shape;  // null until a sequence has ended here
+
+    bool isEncodedAt(std::string_view bytes) const {
+      using Word = std::uint64_t;
+      const std::size_t size = encodedSize;
+      if (size > bytes.size()) return false;
+      if (size < sizeof(Word)) return size != 0 && sameBytes(bytes.data(), encoded.data(), size);
+      const auto differ = [&](std::size_t at) {
+        return loadAt<Word>(encoded.data() + at) ^ loadAt<Word>(bytes.data() + at);
+      };
+      Word different = differ(0) | differ(size - sizeof(Word));
+      if (size > 2 * sizeof(Word)) different |= differ(sizeof(Word)) | differ(size - 2 * sizeof(Word));
+      return different == 0;
+    }
   };
+  static_assert(kMaxKeysOfShape <= std::numeric_limits<std::uint16_t>::max());
+  static_assert(kMaxKeys < std::numeric_limits<std::uint16_t>::max());
 
   // What the table remembers of a shape.
   struct Interned {
@@ -137,7 +167,12 @@ class ShapeTable {
     return shapes_.size() >= kMaxShapes || kMaxBytes - bytes_ < sizeof(Interned) + sizeof(Shape);
   }
   Node& at(Place place) { return nodes_[static_cast<std::size_t>(place)]; }
-  Place probe(Place from, std::string_view key);
+  std::size_t walkUnexpected(Place& place, std::string_view bytes);
+  // Where recent_ has the key after `from` whose encoded form begins with these kRecentBytes.
+  std::uint16_t& recentAt(Place from, const char* bytes) {
+    const std::uint64_t begin = loadAt<std::uint32_t>(bytes) | static_cast<std::uint64_t>(from) << 32U;
+    return recent_[begin * kRecentFactor >> (64 - kRecentBits)];
+  }
   const Shape* makeShape(Place place);
   const Shape* makeExtended(const Shape& shape, std::span<const ValueMapEntry> constants, std::size_t hash);
   // Where the next new shape is interned.
@@ -155,6 +190,7 @@ class ShapeTable {
   const std::uint32_t knownSet_;
   std::vector<Node> nodes_;
   Index nodesByKey_;
+  std::array<std::uint16_t, std::size_t{1} << kRecentBits> recent_{};  // nodes that a walk did not expect
   std::vector<Interned> shapes_;  // in the order of their numbers, from 1
   Index extensions_;
   std::size_t bytes_ = 0;

@@ -252,5 +252,59 @@ TEST(ShapeTableTest, FindsOneOfManyKeysThatMayFollow) {
     EXPECT_EQ(table.find(ShapeTable::root(), std::to_string(at)), places[static_cast<std::size_t>(at)]);
 }
 
+// The key as MessagePack has it, with a value behind it.
+std::string entryOf(const std::string& key) { return static_cast<char>(0xA0 + key.size()) + key + "\x07"; }
+
+TEST(ShapeTableTest, WalksAlongKeysThatCameLately) {
+  for (std::size_t size = 3; size < 32; ++size) {
+    ShapeTable table;
+    const std::string key(size, 'k');
+    const std::string other(34 - size, 'o');
+    const ShapeTable::Place first = table.next(ShapeTable::root(), "first");
+    const ShapeTable::Place place = table.next(first, key);
+    const ShapeTable::Place beside = table.next(first, other);
+    ShapeTable::Place walked = first;
+    EXPECT_EQ(table.walk(walked, entryOf(other)), 1 + other.size());
+    EXPECT_EQ(walked, beside);
+    // Any of a few is found when it has been looked for, but no other.
+    EXPECT_EQ(table.find(first, key), place);
+    EXPECT_EQ(table.find(first, other), beside);
+    walked = first;
+    EXPECT_EQ(table.walk(walked, entryOf(key)), 1 + size);
+    EXPECT_EQ(walked, place);
+    walked = first;
+    EXPECT_EQ(table.walk(walked, entryOf(key + "x")), 0U);
+    EXPECT_EQ(table.walk(walked, std::string_view(entryOf(key)).substr(0, size)), 0U);
+    EXPECT_EQ(walked, first);
+    walked = ShapeTable::root();
+    EXPECT_EQ(table.walk(walked, entryOf(key)), 0U);
+  }
+}
+
+TEST(ShapeTableTest, DoesNotWalkAlongAKeyThatDiffersInOneCharacter) {
+  for (std::size_t size = 1; size < 32; ++size) {
+    ShapeTable table;
+    const ShapeTable::Place place = table.next(ShapeTable::root(), std::string(size, 'k'));
+    for (std::size_t at = 0; at < size; ++at) {
+      std::string other(size, 'k');
+      other[at] = 'o';
+      ShapeTable::Place walked = ShapeTable::root();
+      EXPECT_EQ(table.walk(walked, entryOf(other)), 0U) << size << " " << at;
+      EXPECT_EQ(table.walk(walked, entryOf(std::string(size, 'k'))), 1 + size);
+      EXPECT_EQ(walked, place);
+    }
+  }
+}
+
+TEST(ShapeTableTest, DoesNotWalkAlongALongKey) {
+  ShapeTable table;
+  const std::string key(32, 'k');
+  const ShapeTable::Place place = table.next(ShapeTable::root(), key);
+  ShapeTable::Place walked = ShapeTable::root();
+  EXPECT_EQ(table.walk(walked, "\xD9\x20" + key), 0U);
+  EXPECT_EQ(table.walk(walked, entryOf(key)), 0U);
+  EXPECT_EQ(table.find(ShapeTable::root(), key), place);
+}
+
 }  // namespace
 }  // namespace tonewerk

@@ -20,8 +20,19 @@ using encoding::byteAt;
 
 // The room for values that is kept from one map to the next.
 constexpr std::size_t kKeptBytes = std::size_t{64} * 1024;
-// How far copyValue() may write behind a value.
-constexpr std::size_t kOvershoot = 16;
+// A number, a boolean or a text of up to 31 bytes takes at most so many bytes.
+constexpr std::size_t kMaxShortValue = 32;
+// How far copies of values may write behind them.
+constexpr std::size_t kOvershoot = kMaxShortValue;
+
+// How many bytes such a value takes, by its first byte; 0 for any other value.
+constexpr std::array<std::uint8_t, 256> shortLengths() {
+  std::array<std::uint8_t, 256> lengths = encoding::kNumberLengths;
+  for (std::size_t size = 0; size < kMaxShortValue; ++size)
+    lengths[encoding::kFixedText + size] = static_cast<std::uint8_t>(1 + size);
+  return lengths;
+}
+constexpr std::array<std::uint8_t, 256> kShortLengths = shortLengths();
 // The deepest value lies in the frame's array, that of the arguments, the map, and an array or a map inside.
 static_assert(kMaxFrameDepth >= 4);
 
@@ -31,12 +42,18 @@ class Checker {
   explicit Checker(std::string_view bytes) : at_(bytes.data()), end_(bytes.data() + bytes.size()) {}
 
   const char* at() const { return at_; }
+  std::string_view rest() const { return {at_, left()}; }
+  // Goes to a place behind whole keys and values that need no check.
+  void goTo(const char* at) { at_ = at; }
   bool isAtEnd() const { return at_ == end_; }
   // The word for a value that the protocol does not allow; null when there was none.
   const char* refused() const { return refused_; }
 
   // Read the start of a map and of an array. None after a problem.
-  std::optional<std::size_t> count();
+  std::optional<std::size_t> count() {
+    const bool isShort = !isAtEnd() && (byteAt(at_) & 0xE0U) == encoding::kFixedMap;
+    return isShort ? byteAt(at_++) & 0x0FU : longCount();
+  }
   // Returns the next key without a check of its characters. None when it is no text, and after a problem.
   std::optional<std::string_view> key();
   // Checks that a key's characters are allowed.
@@ -73,6 +90,7 @@ class Checker {
     refused_ = what;
     return false;
   }
+  std::optional<std::size_t> longCount();
   // Returns the body of a text or an extension, and goes behind it.
   std::optional<std::string_view> body();
   // The same for a text, most of which are short.
@@ -89,7 +107,7 @@ class Checker {
   const char* refused_ = nullptr;
 };
 
-std::optional<std::size_t> Checker::count() {
+std::optional<std::size_t> Checker::longCount() {
   if (isAtEnd() || encoding::headerLength(byteAt(at_)) > left()) return std::nullopt;
   const encoding::Extent extent = encoding::extentAt(at_);
   at_ += extent.header;
@@ -191,24 +209,59 @@ bool Checker::map() {
   return true;
 }
 
-// Most values are short: copies some bytes more instead of exactly `size`, where `from` in `bytes` has them.
-char* copyValue(char* to, const char* from, std::size_t size, std::string_view bytes) {
-  if (size <= kOvershoot && static_cast<std::size_t>(bytes.data() + bytes.size() - from) >= kOvershoot) {
-    std::memcpy(to, from, kOvershoot);
-    return to + size;
+// Copies some bytes more instead of exactly `size` where so many may be read, which takes less time.
+void copyShort(char* to, const char* from, std::size_t size, std::size_t readable) {
+  constexpr std::size_t kHalf = kMaxShortValue / 2;
+  if (readable < (size > kHalf ? kMaxShortValue : kHalf)) {
+    copyBytes(to, from, size);
+    return;
   }
-  return copyBytes(to, from, size);
+  std::memcpy(to, from, kHalf);
+  if (size > kHalf) std::memcpy(to + kHalf, from + kHalf, kHalf);
+}
+
+// How far a map is packed.
+struct Progress {
+  std::size_t missing;  // entries
+  ShapeTable::Place place = ShapeTable::root();
+  char* end;  // of the values
+};
+
+// Packs entries while their keys are short and known, and their values short and, if they are texts, ASCII.
+// Nearly all entries are. `behind` the checked bytes lie so many others.
+void packUsual(Checker& checker, ShapeTable& shapes, std::size_t behind, Progress& progress) {
+  Progress now = progress;
+  std::string_view bytes = checker.rest();
+  for (; now.missing > 0; --now.missing) {
+    ShapeTable::Place place = now.place;
+    const std::size_t keySize = shapes.walk(place, bytes);
+    if (keySize == 0 || keySize == bytes.size()) break;
+    const char* const value = bytes.data() + keySize;
+    const std::size_t left = bytes.size() - keySize;
+    const std::uint8_t first = byteAt(value);
+    const std::size_t size = kShortLengths[first];
+    if (size == 0 || size > left) break;
+    if ((first & 0xE0U) == encoding::kFixedText && !isAscii({value + 1, size - 1})) break;
+    copyShort(now.end, value, size, left + behind);
+    now.end += size;
+    now.place = place;
+    bytes = {value + size, left - size};
+  }
+  checker.goTo(bytes.data());
+  progress = now;
 }
 
 }  // namespace
 
-PackedMapReader::Read PackedMapReader::read(std::string_view bytes, ShapeTable& shapes, PackedChunk* chunk) {
-  Read read = pack(bytes, shapes, chunk);
+PackedMapReader::Read PackedMapReader::read(std::string_view bytes, ShapeTable& shapes, std::size_t behind,
+                                            PackedChunk* chunk) {
+  Read read = pack(bytes, shapes, behind, chunk);
   if (values_.size() > kKeptBytes) values_ = {};
   return read;
 }
 
-PackedMapReader::Read PackedMapReader::pack(std::string_view bytes, ShapeTable& shapes, PackedChunk* chunk) {
+PackedMapReader::Read PackedMapReader::pack(std::string_view bytes, ShapeTable& shapes, std::size_t behind,
+                                            PackedChunk* chunk) {
   Checker checker(bytes);
   const auto stopped = [&] {
     const bool isRefused = checker.refused() != nullptr;
@@ -218,27 +271,28 @@ PackedMapReader::Read PackedMapReader::pack(std::string_view bytes, ShapeTable& 
   const std::optional<std::size_t> entries = checker.count();
   if (!entries) return {};
   if (values_.size() < bytes.size() + kOvershoot) values_.resize(bytes.size() + kOvershoot);
-  char* end = values_.data();
-  ShapeTable::Place place = ShapeTable::root();
-  for (std::size_t left = *entries; left > 0; --left) {
+  Progress progress{.missing = *entries, .end = values_.data()};
+  for (;; --progress.missing) {
+    packUsual(checker, shapes, behind, progress);
+    if (progress.missing == 0) break;
     std::optional<std::string_view> key = checker.shortKey();
     if (!key) key = checker.key();
     if (!key) return stopped();
-    ShapeTable::Place next = shapes.find(place, *key);
+    ShapeTable::Place next = shapes.find(progress.place, *key);
     if (next == ShapeTable::none()) {
       if (!checker.isValidKey(*key)) return stopped();
-      next = shapes.add(place, *key);
+      next = shapes.add(progress.place, *key);
       if (next == ShapeTable::none()) return {};
     }
-    place = next;
+    progress.place = next;
     const char* const value = checker.at();
     if (!checker.shortValue() && !checker.value()) return stopped();
-    end = copyValue(end, value, static_cast<std::size_t>(checker.at() - value), bytes);
+    progress.end = copyBytes(progress.end, value, static_cast<std::size_t>(checker.at() - value));
   }
   if (!checker.isAtEnd()) return {};
-  const Shape* shape = shapes.shapeAt(place);
+  const Shape* shape = shapes.shapeAt(progress.place);
   if (shape == nullptr || shape->hasDoubledKey()) return {};
-  const std::string_view values(values_.data(), static_cast<std::size_t>(end - values_.data()));
+  const std::string_view values(values_.data(), static_cast<std::size_t>(progress.end - values_.data()));
   return {Result::kPacked, ValueMap(PackedMap::make(*shape, values, chunk)), ""};
 }
 

@@ -54,7 +54,8 @@ IncomingMessage* RpcFrameDecoder::decodeMessage(const Frame& frame, ShapeTable& 
     return nullptr;
   }
   const std::size_t payloadBytes = frame.arguments[1] - frame.arguments[0];
-  PackedMapReader::Read read = reader_.read(frame.bytes.substr(frame.arguments[0], payloadBytes), shapes);
+  PackedMapReader::Read read = reader_.read(frame.bytes.substr(frame.arguments[0], payloadBytes), shapes,
+                                            frame.bytes.size() - frame.arguments[1]);
   if (read.result != PackedMapReader::Result::kPacked) return nullptr;
   message_.payload = std::move(read.map);
   return &message_;

@@ -146,9 +146,9 @@ RpcFrameScanner::Result RpcFrameScanner::scan(std::string_view bytes) {
   return scanArguments(bytes);
 }
 
-// Finds the end of usual arguments: few, of which maps and arrays hold only numbers and short texts. All others
-// and those near the end of the bytes are left to scanArguments(), which begins anew; so nothing is read more
-// than twice.
+// Finds the end of usual arguments: few, of which maps and arrays hold only numbers and short texts. All
+// others and those near the end of the bytes are left to scanArguments(), which begins anew; so nothing is
+// read more than twice.
 bool RpcFrameScanner::scanUsualArguments(std::string_view bytes) {
   const std::size_t count = frame_.argumentCount;
   if (count > kMaxKnownArguments) return false;
@@ -161,8 +161,8 @@ bool RpcFrameScanner::scanUsualArguments(std::string_view bytes) {
   return true;
 }
 
-// Reads the head of a request or a notification as clients usually write it, and leaves all others to scanHead().
-// With so many bytes it need not ask whether each part has arrived.
+// Reads the head of a request or a notification as clients usually write it, and leaves all others to
+// scanHead(). With so many bytes it need not ask whether each part has arrived.
 bool RpcFrameScanner::scanUsualHead(std::string_view bytes) {
   if (bytes.size() < kUsualHeadBytes) return false;
   const char* at = bytes.data();
