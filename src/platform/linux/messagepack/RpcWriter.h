@@ -34,6 +34,8 @@ class RpcWriter {
   void value(const Value& value);
 
  private:
+  void success(std::uint32_t identifier);
+
   std::string& out_;
 };
 

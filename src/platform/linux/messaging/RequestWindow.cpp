@@ -1,15 +1,44 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/messaging/RequestWindow.h"
 
+#include <cassert>
+#include <utility>
+
 #include "platform/linux/messagepack/RpcLimits.h"
 
 namespace tonewerk {
 
+namespace {
+
+thread_local RequestWindow* batchedWindow = nullptr;
+
+}  // namespace
+
+RequestWindow::Batch::Batch(RequestWindow& window) {
+  assert(batchedWindow == nullptr);
+  batchedWindow = &window;
+}
+
+RequestWindow::Batch::~Batch() {
+  RequestWindow& window = *std::exchange(batchedWindow, nullptr);
+  const std::uint64_t requests = std::exchange(window.batchedRequests_, 0);
+  const std::uint64_t bytes = std::exchange(window.batchedBytes_, 0);
+  if (requests > 0) window.finished(requests, bytes);
+}
+
 void RequestWindow::finished(std::size_t bytes) {
+  if (batchedWindow != this) return finished(1, bytes);
+  ++batchedRequests_;
+  batchedBytes_ += bytes;
+}
+
+void RequestWindow::finished(std::uint64_t requests, std::uint64_t bytes) {
   finishedBytes_.fetch_add(bytes);
   // Both functions use sequentially consistent atomics: either this thread sees the count that hasRoom()
   // waits for, or hasRoom() sees this request's end.
-  if (finishedRequests_.fetch_add(1) + 1 == wakeAt_.load()) waker_->wake(connection_);
+  const std::uint64_t before = finishedRequests_.fetch_add(requests);
+  const std::uint64_t awaited = wakeAt_.load();
+  if (before < awaited && awaited <= before + requests) waker_->wake(connection_);
 }
 
 void RequestWindow::begin(std::size_t bytes) {

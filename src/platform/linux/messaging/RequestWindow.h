@@ -22,6 +22,16 @@ class RequestWindow final : public InFlightCounter, public std::enable_shared_fr
   RequestWindow(std::shared_ptr<IoWaker> waker, std::uint64_t connection)
       : waker_(std::move(waker)), connection_(connection) {}
 
+  // While it lives, requests that finish on its thread are counted together, at its end. Only for work on the
+  // listener's thread, where nobody waits for them meanwhile. A thread has one batch at a time.
+  class Batch {
+   public:
+    explicit Batch(RequestWindow& window);
+    Batch(const Batch&) = delete;
+    Batch& operator=(const Batch&) = delete;
+    ~Batch();
+  };
+
   // Any thread.
   void finished(std::size_t bytes) override;
 
@@ -39,6 +49,7 @@ class RequestWindow final : public InFlightCounter, public std::enable_shared_fr
  private:
   static constexpr std::uint64_t kNever = std::numeric_limits<std::uint64_t>::max();
 
+  void finished(std::uint64_t requests, std::uint64_t bytes);
   bool isBelowBound(std::size_t otherBytes) const;
 
   const std::shared_ptr<IoWaker> waker_;
@@ -49,6 +60,9 @@ class RequestWindow final : public InFlightCounter, public std::enable_shared_fr
   std::uint64_t startedBytes_ = 0;
   std::uint64_t knownFinishedRequests_ = 0;
   std::uint64_t knownFinishedBytes_ = 0;
+  // Of the batch.
+  std::uint64_t batchedRequests_ = 0;
+  std::uint64_t batchedBytes_ = 0;
 
   std::atomic<std::uint64_t> finishedRequests_{0};
   std::atomic<std::uint64_t> finishedBytes_{0};

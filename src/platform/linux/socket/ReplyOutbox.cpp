@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/socket/ReplyOutbox.h"
 
+#include <cassert>
 #include <cerrno>
 #include <sys/socket.h>
 #include <utility>
@@ -16,10 +17,30 @@ constexpr std::size_t kMaxKeptBytes = std::size_t{64} * 1024;
 // been sent.
 constexpr std::size_t kNotableBytes = std::size_t{64} * 1024;
 
+thread_local ReplyOutbox* gatheringOutbox = nullptr;
+
 }  // namespace
+
+ReplyOutbox::Gathering::Gathering(ReplyOutbox& outbox) {
+  assert(gatheringOutbox == nullptr);
+  gatheringOutbox = &outbox;
+}
+
+ReplyOutbox::Gathering::~Gathering() {
+  ReplyOutbox& outbox = *gatheringOutbox;
+  {
+    const MutexLock lock(outbox.mutex_);
+    outbox.takeGathered();
+  }
+  gatheringOutbox = nullptr;
+}
 
 void ReplyOutbox::reply(std::uint32_t requestIdentifier, const std::optional<ReplyError>& error,
                         const std::optional<Value>& result) {
+  if (gatheringOutbox == this && (!gathered_.empty() || BatchScope::defer(shared_from_this()))) {
+    RpcWriter(gathered_).response(requestIdentifier, error, result);
+    return;
+  }
   {
     const MutexLock lock(mutex_);
     if (isClosed_ || state_ == State::kRefused) return;
@@ -37,6 +58,7 @@ void ReplyOutbox::endOfBatch() {
   {
     const MutexLock lock(mutex_);
     isSendDeferred_ = false;
+    takeGathered();
     if (isClosed_ || state_ != State::kOpen) return;
     const std::size_t before = unsent_.size();
     sendUnsent();
@@ -54,10 +76,21 @@ ReplyOutbox::State ReplyOutbox::flush() {
 void ReplyOutbox::close() {
   const MutexLock lock(mutex_);
   if (isClosed_) return;
+  takeGathered();
   if (state_ != State::kRefused) sendUnsent();
   isClosed_ = true;
   unsent_ = {};
   sent_ = 0;
+}
+
+void ReplyOutbox::takeGathered() {
+  if (gatheringOutbox != this) return;
+  if (!isClosed_ && state_ != State::kRefused) {
+    unsent_ += gathered_;
+    unsentBytes_ = unsent_.size() - sent_;
+  }
+  gathered_.clear();
+  if (gathered_.capacity() > kMaxKeptBytes) gathered_ = {};
 }
 
 void ReplyOutbox::sendUnsent() {

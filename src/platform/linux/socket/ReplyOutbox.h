@@ -33,6 +33,16 @@ class ReplyOutbox final : public ReplySink,
     kRefused,  // the peer does not take any more bytes
   };
 
+  // While it lives, the replies of its thread are gathered without a lock. They are sent at the end of the
+  // thread's batch, as always. A thread gathers for one outbox at a time, and an outbox on one thread.
+  class Gathering {
+   public:
+    explicit Gathering(ReplyOutbox& outbox);
+    Gathering(const Gathering&) = delete;
+    Gathering& operator=(const Gathering&) = delete;
+    ~Gathering();
+  };
+
   // `socket` stays open until close(). The waker wakes the listener's thread for `connection`.
   ReplyOutbox(int socket, std::shared_ptr<IoWaker> waker, std::uint64_t connection)
       : socket_(socket), waker_(std::move(waker)), connection_(connection) {}
@@ -50,12 +60,15 @@ class ReplyOutbox final : public ReplySink,
   void close();
 
  private:
+  // Moves what the calling thread has gathered to what is unsent.
+  void takeGathered() REQUIRES(mutex_);
   void sendUnsent() REQUIRES(mutex_);
 
   const int socket_;
   const std::shared_ptr<IoWaker> waker_;
   const std::uint64_t connection_;
   std::atomic<std::size_t> unsentBytes_{0};
+  std::string gathered_;  // used by the thread that gathers
   Mutex mutex_;
   std::string unsent_ GUARDED_BY(mutex_);
   std::size_t sent_ GUARDED_BY(mutex_) = 0;  // bytes of unsent_

@@ -55,6 +55,8 @@ void UnixRequests::deliverAtOnce() {
 }
 
 bool UnixRequests::deliverQuick() {
+  const RequestWindow::Batch finished(*context_->window);
+  const ReplyOutbox::Gathering replies(*context_->outbox);
   ShapeTable* const shapes = context_->handler->shapes();
   while (delivered_ < requests_.size()) {
     if (!deliverNext(*context_->decoder, shapes, Wanted::kQuick)) return false;

@@ -56,6 +56,18 @@ TEST(RpcWriterTest, MakesARequestAndANotificationOfOneBody) {
   }
 }
 
+TEST(RpcWriterTest, WritesSuccessWithTheShortestFormOfTheIdentifier) {
+  const auto success = [](std::uint32_t identifier) {
+    std::string out = "x";
+    RpcWriter(out).response(identifier, std::nullopt, std::nullopt);
+    return out.substr(1);
+  };
+  EXPECT_EQ(success(5), fromHex("94 01 05 C0 C0"));
+  EXPECT_EQ(success(0xFFFF), fromHex("94 01 CD FFFF C0 C0"));
+  EXPECT_EQ(success(0x10000), fromHex("94 01 CE 00010000 C0 C0"));
+  EXPECT_EQ(success(0xFEDCBA98), fromHex("94 01 CE FEDCBA98 C0 C0"));
+}
+
 TEST(RpcWriterTest, WritesResults) {
   EXPECT_EQ(responseWith(std::nullopt, Value(true)), fromHex("94 01 05 C0 C3"));
   EXPECT_EQ(responseWith(std::nullopt, std::nullopt), fromHex("94 01 05 C0 C0"));

@@ -94,5 +94,32 @@ TEST_F(RequestWindowTest, NeverMissesTheLastFinishOnAnotherThread) {
   }
 }
 
+TEST_F(RequestWindowTest, CountsWhatFinishesInABatchAtItsEnd) {
+  auto tokens = start(kMaxUnfinishedRequests, 1);
+  EXPECT_FALSE(window->hasRoom(0));
+  {
+    const RequestWindow::Batch batch(*window);
+    tokens.clear();
+    EXPECT_THAT(waker->take(), IsEmpty());
+  }
+  EXPECT_THAT(waker->take(), ElementsAre(kConnection));
+  EXPECT_TRUE(window->hasRoom(kMaxUnfinishedBytes - 1));  // the bytes are counted, too
+  tokens = start(kMaxUnfinishedRequests, 1);
+  EXPECT_FALSE(window->hasRoom(0));
+}
+
+TEST_F(RequestWindowTest, ABatchIsOfOneWindowAndOneThread) {
+  const auto other = std::make_shared<RequestWindow>(waker, kConnection + 1);
+  InFlightToken large = other->start(kMaxUnfinishedBytes);
+  std::vector<InFlightToken> tokens = start(kMaxUnfinishedRequests, 1);
+  EXPECT_FALSE(other->hasRoom(0));
+  EXPECT_FALSE(window->hasRoom(0));
+  const RequestWindow::Batch batch(*window);
+  large = {};
+  EXPECT_THAT(waker->take(), ElementsAre(kConnection + 1));
+  std::thread([&] { tokens.clear(); }).join();
+  EXPECT_THAT(waker->take(), ElementsAre(kConnection));
+}
+
 }  // namespace
 }  // namespace tonewerk
