@@ -36,8 +36,9 @@ class PackedMapReader {
   // further ones, the tree that find() may make beside the bytes is not many times larger than they are.
   static constexpr std::size_t kMaxNestedElements = 64;
 
-  // Takes exactly one encoded map; other bytes give kTree. Its shape comes from `shapes`. So many bytes `behind`
-  // the map may be read, too, which makes its last entries faster. The map lies in `chunk`, if it has room.
+  // Takes exactly one encoded map; other bytes give kTree. Its shape comes from `shapes`. So many bytes
+  // `behind` the map may be read, too, which makes its last entries faster. The map lies in `chunk`, if it
+  // has room.
   [[nodiscard]] Read read(std::string_view bytes, ShapeTable& shapes, std::size_t behind = 0,
                           PackedChunk* chunk = nullptr);
 

@@ -62,7 +62,7 @@ IncomingMessage* RpcFrameDecoder::decodeMessage(const Frame& frame, ShapeTable& 
 }
 
 void RpcFrameDecoder::releaseMessage() {
-  message_.payload = {};
+  if (!message_.payload.empty()) message_.payload = {};  // usually it has been moved away
   if (message_.reporterIDs && message_.reporterIDs->capacity() > kMaxKeptIdentifiers) {
     message_.reporterIDs.reset();
   }

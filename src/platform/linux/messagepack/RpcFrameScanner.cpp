@@ -54,8 +54,8 @@ struct RpcFrameScanner::Header {
 
 namespace {
 
-// Goes over values of which nearly all are numbers and short texts. Far from the end of the bytes these need not
-// be compared with it.
+// Goes over values of which nearly all are numbers and short texts. Far from the end of the bytes these need
+// not be compared with it.
 class ShortValues {
  public:
   ShortValues(std::string_view bytes, std::size_t at)
@@ -66,8 +66,8 @@ class ShortValues {
   // The offset of the next value.
   std::size_t at() const { return static_cast<std::size_t>(at_ - begin_); }
 
-  // Goes behind the next value, an array or a map included that holds none. False at other values than texts of
-  // up to 255 bytes and those whose first byte says how long they are, and near the end of the bytes.
+  // Goes behind the next value, an array or a map included that holds none. False at other values than texts
+  // of up to 255 bytes and those whose first byte says how long they are, and near the end of the bytes.
   bool skipArgument() {
     if (at_ >= limit_) return false;
     const std::uint8_t first = encoding::byteAt(at_);
