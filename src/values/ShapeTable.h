@@ -93,6 +93,8 @@ class ShapeTable {
     return extended(shape, std::span(constants.begin(), constants.size()));
   }
 
+  // A number that no other table has, nor had.
+  std::uint64_t identifier() const { return identifier_; }
   // Whether the shape is interned here, so that it knows the keys of this table.
   bool owns(const Shape& shape) const { return shape.origin().table == identifier_; }
 

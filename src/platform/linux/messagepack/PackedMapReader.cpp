@@ -1,7 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/messagepack/PackedMapReader.h"
 
+#include <algorithm>
 #include <array>
+#include <bit>
 #include <cstdint>
 #include <cstring>
 #include <optional>
@@ -220,6 +222,21 @@ void copyShort(char* to, const char* from, std::size_t size, std::size_t readabl
   if (size > kHalf) std::memcpy(to + kHalf, from + kHalf, kHalf);
 }
 
+// Returns how many bytes at the start of both are the same.
+std::size_t commonBytes(const char* a, const char* b, std::size_t size) {
+  using Word = std::uint64_t;
+  std::size_t at = 0;
+  for (; at + sizeof(Word) <= size; at += sizeof(Word)) {
+    const Word different = loadAt<Word>(a + at) ^ loadAt<Word>(b + at);
+    if (different == 0) continue;
+    const int bits = std::endian::native == std::endian::little ? std::countr_zero(different)
+                                                                : std::countl_zero(different);
+    return at + static_cast<std::size_t>(bits) / 8;
+  }
+  while (at < size && a[at] == b[at]) ++at;
+  return at;
+}
+
 // How far a map is packed.
 struct Progress {
   std::size_t missing;  // entries
@@ -228,8 +245,8 @@ struct Progress {
 };
 
 // Packs entries while their keys are short and known, and their values short and, if they are texts, ASCII.
-// Nearly all entries are. `behind` the checked bytes lie so many others.
-void packUsual(Checker& checker, ShapeTable& shapes, std::size_t behind, Progress& progress) {
+// Nearly all entries are. Behind the checked bytes, so many others are `readable`.
+void packUsual(Checker& checker, ShapeTable& shapes, std::size_t readable, Progress& progress) {
   Progress now = progress;
   std::string_view bytes = checker.rest();
   for (; now.missing > 0; --now.missing) {
@@ -242,7 +259,7 @@ void packUsual(Checker& checker, ShapeTable& shapes, std::size_t behind, Progres
     const std::size_t size = kShortLengths[first];
     if (size == 0 || size > left) break;
     if ((first & 0xE0U) == encoding::kFixedText && !isAscii({value + 1, size - 1})) break;
-    copyShort(now.end, value, size, left + behind);
+    copyShort(now.end, value, size, left + readable);
     now.end += size;
     now.place = place;
     bytes = {value + size, left - size};
@@ -253,15 +270,15 @@ void packUsual(Checker& checker, ShapeTable& shapes, std::size_t behind, Progres
 
 }  // namespace
 
-PackedMapReader::Read PackedMapReader::read(std::string_view bytes, ShapeTable& shapes, std::size_t behind,
-                                            PackedChunk* chunk) {
-  Read read = pack(bytes, shapes, behind, chunk);
+PackedMapReader::Read PackedMapReader::read(std::string_view bytes, ShapeTable& shapes,
+                                            const PackedMapHints& hints, PackedChunk* chunk) {
+  Read read = pack(bytes, shapes, hints, chunk);
   if (values_.size() > kKeptBytes) values_ = {};
   return read;
 }
 
-PackedMapReader::Read PackedMapReader::pack(std::string_view bytes, ShapeTable& shapes, std::size_t behind,
-                                            PackedChunk* chunk) {
+PackedMapReader::Read PackedMapReader::pack(std::string_view bytes, ShapeTable& shapes,
+                                            const PackedMapHints& hints, PackedChunk* chunk) {
   Checker checker(bytes);
   const auto stopped = [&] {
     const bool isRefused = checker.refused() != nullptr;
@@ -271,9 +288,13 @@ PackedMapReader::Read PackedMapReader::pack(std::string_view bytes, ShapeTable& 
   const std::optional<std::size_t> entries = checker.count();
   if (!entries) return {};
   if (values_.size() < bytes.size() + kOvershoot) values_.resize(bytes.size() + kOvershoot);
+  if (const RecentMaps::Map* recent = recent_.find(hints.kind, shapes)) {
+    if (const auto values = packLike(*recent, bytes, hints.readable))
+      return {Result::kPacked, ValueMap(PackedMap::make(*recent->shape, *values, chunk)), ""};
+  }
   Progress progress{.missing = *entries, .end = values_.data()};
   for (;; --progress.missing) {
-    packUsual(checker, shapes, behind, progress);
+    packUsual(checker, shapes, hints.readable, progress);
     if (progress.missing == 0) break;
     std::optional<std::string_view> key = checker.shortKey();
     if (!key) key = checker.key();
@@ -293,7 +314,50 @@ PackedMapReader::Read PackedMapReader::pack(std::string_view bytes, ShapeTable& 
   const Shape* shape = shapes.shapeAt(progress.place);
   if (shape == nullptr || shape->hasDoubledKey()) return {};
   const std::string_view values(values_.data(), static_cast<std::size_t>(progress.end - values_.data()));
+  recent_.offer(hints.kind, shapes, bytes, *shape, values);
   return {Result::kPacked, ValueMap(PackedMap::make(*shape, values, chunk)), ""};
+}
+
+std::optional<std::string_view> PackedMapReader::packLike(const RecentMaps::Map& recent,
+                                                          std::string_view bytes, std::size_t readable) {
+  const char* const before = recent.bytes.data();
+  const RecentMaps::Entry* entry = recent.entries.data();
+  const RecentMaps::Entry* const last = entry + recent.entries.size();
+  Checker checker(bytes);
+  char* to = values_.data();
+  std::size_t at = 0;      // in the recent map: up to here all is done
+  std::size_t packed = 0;  // up to here its values are
+  for (;;) {
+    const std::size_t left = recent.bytes.size() - at;
+    const std::size_t same =
+        at + commonBytes(checker.at(), before + at, std::min(left, checker.rest().size()));
+    const RecentMaps::Entry* const first = entry;
+    while (entry != last && entry->end <= same) ++entry;
+    if (entry != first) {
+      const RecentMaps::Entry& done = entry[-1];
+      to = copyBytes(to, recent.values.data() + packed, done.packedEnd - packed);
+      checker.goTo(checker.at() + (done.end - at));
+      at = done.end;
+      packed = done.packedEnd;
+    }
+    if (entry == last) break;
+    if (same < entry->value) return std::nullopt;  // another key, or the end
+    checker.goTo(checker.at() + (entry->value - at));
+    const char* const value = checker.at();
+    if (!checker.shortValue() && !checker.value()) return std::nullopt;
+    const auto size = static_cast<std::size_t>(checker.at() - value);
+    if (size <= kMaxShortValue) {
+      copyShort(to, value, size, checker.rest().size() + size + readable);
+    } else {
+      copyBytes(to, value, size);
+    }
+    to += size;
+    at = entry->end;
+    packed = entry->packedEnd;
+    ++entry;
+  }
+  if (!checker.isAtEnd()) return std::nullopt;
+  return std::string_view(values_.data(), static_cast<std::size_t>(to - values_.data()));
 }
 
 }  // namespace tonewerk

@@ -54,8 +54,9 @@ IncomingMessage* RpcFrameDecoder::decodeMessage(const Frame& frame, ShapeTable& 
     return nullptr;
   }
   const std::size_t payloadBytes = frame.arguments[1] - frame.arguments[0];
+  const std::uint64_t kind = std::uint64_t{message_.category} << 16U | message_.type;
   PackedMapReader::Read read = reader_.read(frame.bytes.substr(frame.arguments[0], payloadBytes), shapes,
-                                            frame.bytes.size() - frame.arguments[1]);
+                                            {kind, frame.bytes.size() - frame.arguments[1]});
   if (read.result != PackedMapReader::Result::kPacked) return nullptr;
   message_.payload = std::move(read.map);
   return &message_;

@@ -219,6 +219,41 @@ TEST_F(PackedMapReaderTest, RefusesTheFirstForbiddenValueInTheSameWords) {
   EXPECT_GT(refused, kMaps / 10);
 }
 
+// Messages of one kind: mostly alike, some damaged. A new reader has no recent map to compare them with.
+TEST_F(PackedMapReaderTest, ReadsMapsOfOneKindLikeANewReader) {
+  PackedMapReader reader;
+  std::size_t packed = 0;
+  std::size_t others = 0;
+  for (std::size_t at = 0; at < kMaps / 10 && !stopsAt(at); ++at) {
+    ShapeTable shapes;
+    ValueMap map = random.map();
+    for (int round = 0; round < 10; ++round) {
+      if (random.isOneIn(2)) map = random.changed(map);
+      std::string bytes = random.bytesOf(map, {.forbiddenValues = random.isOneIn(5)});
+      if (random.isOneIn(5)) bytes[random.below(bytes.size())] ^= static_cast<char>(1U << random.below(8));
+      if (random.isOneIn(10)) bytes.pop_back();
+      if (random.isOneIn(10)) bytes += '\x01';
+      const std::string behind = bytes + std::string(random.below(40), '\x02');
+      const std::string_view own = std::string_view(behind).substr(0, bytes.size());
+      const PackedMapReader::Read expected = PackedMapReader().read(std::string(bytes), shapes);
+      const PackedMapReader::Read read = reader.read(own, shapes, {at % 5, behind.size() - bytes.size()});
+      ASSERT_EQ(read.result, expected.result);
+      EXPECT_STREQ(read.refused, expected.refused);
+      if (read.result != Result::kPacked) {
+        ++others;
+        continue;
+      }
+      ++packed;
+      EXPECT_EQ(read.map, expected.map);
+      if (read.map.packed() == nullptr) continue;
+      EXPECT_EQ(&read.map.packed()->shape(), &expected.map.packed()->shape());
+      EXPECT_EQ(read.map.packed()->values(), expected.map.packed()->values());
+    }
+  }
+  EXPECT_GT(packed, kMaps / 3);
+  EXPECT_GT(others, kMaps / 20);
+}
+
 TEST_F(PackedMapReaderTest, ComparesLikeTrees) {
   const std::array<std::string_view, 4> keys = {"twreporting_timestamp", "level", "absent", "a"};
   std::size_t equal = 0;
