@@ -88,7 +88,10 @@ EncodedValue PackedMap::at(std::size_t slot) const {
   const Shape& keys = shape();
   if (keys.isConstant(slot)) return keys.constant(slot);
   EncodedValue value(begin());
-  for (std::size_t before = 0; before < slot; ++before) {
+  std::size_t before = 0;
+  for (const std::size_t end = std::min(slot, keys.firstConstant()); before < end; ++before)
+    value = EncodedValue(value.end());
+  for (; before < slot; ++before) {
     if (!keys.isConstant(before)) value = EncodedValue(value.end());
   }
   return value;

@@ -68,8 +68,9 @@ void Shape::complete(KnownKeys known) {
   hasKeyWithSpace_ = std::any_of(slots_.begin(), slots_.end(), [](const Slot& slot) {
     return slot.key.view().find(' ') != std::string_view::npos;
   });
-  variables_ = static_cast<std::size_t>(std::count_if(
-      slots_.begin(), slots_.end(), [](const Slot& slot) { return slot.constant == kVariable; }));
+  const auto isVariable = [](const Slot& slot) { return slot.constant == kVariable; };
+  firstConstant_ = static_cast<std::size_t>(std::ranges::find_if_not(slots_, isVariable) - slots_.begin());
+  variables_ = static_cast<std::size_t>(std::ranges::count_if(slots_, isVariable));
   wireBytes_ = constants_.size();
   for (const Slot& slot : slots_) wireBytes_ += wireBytesOf(slot.key.size());
   known_.fill(kUnknown);

@@ -71,6 +71,8 @@ class Shape {
   EncodedValue constant(std::size_t slot) const {
     return isConstant(slot) ? EncodedValue(constants_.data() + slots_[slot].constant) : EncodedValue();
   }
+  // No slot before this one is constant.
+  std::size_t firstConstant() const { return firstConstant_; }
   // How many slots are not constant.
   std::size_t variables() const { return variables_; }
   // Returns an upper bound of the bytes that the keys and the constants take in MessagePack. O(1).
@@ -108,6 +110,7 @@ class Shape {
   bool hasKeyWithSpace_ = false;
   bool hasDoubledKey_ = false;
   std::array<std::uint32_t, kMaxKnownKeys> known_{};
+  std::size_t firstConstant_ = 0;
   std::size_t variables_ = 0;
   std::size_t wireBytes_ = 0;
   std::vector<Slot> slots_;
