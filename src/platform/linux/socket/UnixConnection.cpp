@@ -10,6 +10,7 @@
 
 #include "platform/Log.h"
 #include "platform/linux/messaging/AllocatorReclaimer.h"
+#include "values/Bytes.h"
 
 namespace tonewerk {
 namespace {
@@ -46,6 +47,7 @@ std::string UnixConnection::description() const {
 }
 
 void UnixConnection::setRequestHandler(const RequestSet& interface, std::shared_ptr<RequestHandler> object) {
+  lastMethod_.reset();
   requestContext_ = std::make_shared<UnixRequestContext>(UnixRequestContext{
       interface, std::move(object), context_.decoder, outbox_, window_, userIdentifier_, context_.owner});
 }
@@ -103,7 +105,7 @@ void UnixConnection::process(SlabBytes received) {
       return;
     }
     const RpcFrameScanner::Frame& frame = scanner_.frame();
-    const std::optional<std::size_t> method = requestContext_->methods.find(frame.method);
+    const std::optional<std::size_t> method = methodOf(frame.method);
     const bool isUrgent = method && requestContext_->handler->isUrgent(*method);
     if (isUrgent) {
       passOn(std::exchange(requests, std::make_unique<UnixRequests>(requestContext_, received.slab)));
@@ -121,6 +123,18 @@ void UnixConnection::process(SlabBytes received) {
   isPaused_ = true;
   unprocessed_ = std::move(received);
   passOn(std::move(requests));
+}
+
+// Most requests are of the method of the one before.
+std::optional<std::size_t> UnixConnection::methodOf(std::string_view name) {
+  const RequestSet& known = requestContext_->methods;
+  if (lastMethod_) {
+    const std::string_view last = known.methods[*lastMethod_].name;
+    if (last.size() == name.size() && sameBytes(last.data(), name.data(), name.size())) return lastMethod_;
+  }
+  const std::optional<std::size_t> method = known.find(name);
+  if (method) lastMethod_ = method;
+  return method;
 }
 
 RpcFrameScanner::Result UnixConnection::scan(std::string_view& bytes) {

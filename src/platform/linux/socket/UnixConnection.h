@@ -73,6 +73,8 @@ class UnixConnection final : public MessagingConnection {
   // Finds the next frame's end. Removes the bytes that it has used from the front of `bytes`. A frame that
   // began in an earlier read is then in begun_.
   [[nodiscard]] RpcFrameScanner::Result scan(std::string_view& bytes);
+  // Its index among the methods; none for an unknown one.
+  [[nodiscard]] std::optional<std::size_t> methodOf(std::string_view name);
   void passOn(std::unique_ptr<UnixRequests> requests);
   void endAsBroken(std::string_view problem);
   void updateInterest();
@@ -91,6 +93,7 @@ class UnixConnection final : public MessagingConnection {
   bool hasEnded_ = false;
 
   RpcFrameScanner scanner_;
+  std::optional<std::size_t> lastMethod_;
   std::string begun_;  // the bytes so far of a frame that did not arrive in one read
   std::shared_ptr<RequestWindow> window_;
   bool isPaused_ = false;
