@@ -23,7 +23,7 @@ constexpr std::int64_t kTest = 11;
 void start(ServerProcess& server, IngestServer side) {
   if (side == IngestServer::kFloor) return server.start(TONEWERK_FLOOR, {server.socketPath()});
   // On internal builds every session also gets a summary file.
-  std::ofstream(server.directory() + "/device-facts.toml") << "InternalBuild = true\n";
+  std::ofstream(server.configurationDirectory() + "/device-facts.toml") << "InternalBuild = true\n";
   server.start(TONEWERK_DAEMON, {});
 }
 
@@ -31,7 +31,7 @@ void start(ServerProcess& server, IngestServer side) {
 void checkStore(const ServerProcess& server, std::size_t wanted) {
   SqliteDatabase database;
   std::optional<std::int64_t> rows;
-  if (database.open(server.directory() + "/reports.db", SqliteDatabase::Mode::kReadOnly,
+  if (database.open(server.stateDirectory() + "/reports.db", SqliteDatabase::Mode::kReadOnly,
                     std::chrono::seconds(1))) {
     rows = database.number("SELECT count(*) FROM analytics_row");
   }

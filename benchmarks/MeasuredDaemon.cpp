@@ -36,7 +36,7 @@ void check(const std::string& storePath, const std::string& table, std::size_t w
 
 MeasuredDaemon::MeasuredDaemon(const std::string& program, const DaemonSettings& settings)
     : settings_(settings) {
-  const std::string& directory = server_.directory();
+  const std::string directory = server_.configurationDirectory();
   if (settings.writesFiles) std::ofstream(directory + "/device-facts.toml") << "InternalBuild = true\n";
   if (!settings.records) {
     std::filesystem::create_directory(directory + "/preferences");
@@ -55,7 +55,7 @@ std::size_t MeasuredDaemon::files() const {
   std::error_code error;
   std::size_t count = 0;
   for (const auto& file :
-       std::filesystem::directory_iterator(server_.directory() + "/Audio/Reporting", error)) {
+       std::filesystem::directory_iterator(server_.logsDirectory() + "/Audio/Reporting", error)) {
     if (file.path().extension() == ".json") ++count;
   }
   return count;

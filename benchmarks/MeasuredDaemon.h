@@ -27,7 +27,7 @@ class MeasuredDaemon {
 
   ServerProcess& server() { return server_; }
   const ServerProcess& server() const { return server_; }
-  std::string storePath() const { return server_.directory() + "/reports.db"; }
+  std::string storePath() const { return server_.stateDirectory() + "/reports.db"; }
 
   // Checks that the store has exactly the events of `messages` messages, and nothing without recording.
   void checkStore(std::size_t messages) const;

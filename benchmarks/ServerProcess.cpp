@@ -28,9 +28,6 @@ constexpr int kIdleSteps = 15;
 // The most processor time that an idle server uses in a step.
 constexpr ServerProcess::Processor kIdleTime = std::chrono::microseconds(200);
 
-const char* const kDirectoryVariables[] = {"RUNTIME_DIRECTORY", "STATE_DIRECTORY", "LOGS_DIRECTORY",
-                                           "CONFIGURATION_DIRECTORY"};
-
 std::string textOfFile(const std::string& path) {
   std::ifstream file(path);
   std::ostringstream text;
@@ -59,6 +56,9 @@ ServerProcess::ServerProcess() {
   std::string name = std::filesystem::temp_directory_path() / "tonewerk-benchmark-XXXXXX";
   if (::mkdtemp(name.data()) == nullptr) throw std::runtime_error("cannot make a temporary directory");
   directory_ = name;
+  for (const std::string& made : {stateDirectory(), logsDirectory(), configurationDirectory()}) {
+    std::filesystem::create_directory(made);
+  }
 }
 
 ServerProcess::~ServerProcess() {
@@ -70,7 +70,10 @@ ServerProcess::~ServerProcess() {
 
 void ServerProcess::start(const std::string& program, const std::vector<std::string>& arguments,
                           const std::string& socket) {
-  for (const char* variable : kDirectoryVariables) ::setenv(variable, directory_.c_str(), 1);
+  ::setenv("RUNTIME_DIRECTORY", directory_.c_str(), 1);
+  ::setenv("STATE_DIRECTORY", stateDirectory().c_str(), 1);
+  ::setenv("LOGS_DIRECTORY", logsDirectory().c_str(), 1);
+  ::setenv("CONFIGURATION_DIRECTORY", configurationDirectory().c_str(), 1);
   std::vector<char*> command{const_cast<char*>(program.c_str())};
   for (const std::string& argument : arguments) command.push_back(const_cast<char*>(argument.c_str()));
   command.push_back(nullptr);

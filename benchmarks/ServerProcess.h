@@ -29,10 +29,15 @@ class ServerProcess {
   ~ServerProcess();
 
   const std::string& directory() const { return directory_; }
+  // Directories of its own below it, as an installed daemon has: it watches some of them for changes, but
+  // not the one with the store.
+  std::string stateDirectory() const { return directory_ + "/state"; }
+  std::string logsDirectory() const { return directory_ + "/logs"; }
+  std::string configurationDirectory() const { return directory_ + "/configuration"; }
   std::string socketPath() const { return directory_ + "/" + kSocket; }
 
-  // Starts the server with directory() as all of its directories, and waits until it listens at socketPath(),
-  // or at `socket` in the directory.
+  // Starts the server with directory() as its runtime directory and the other directories, and waits until it
+  // listens at socketPath(), or at `socket` in the directory.
   void start(const std::string& program, const std::vector<std::string>& arguments,
              const std::string& socket = kSocket);
 
