@@ -8,6 +8,7 @@
 #include <chrono>
 #include <cstdint>
 #include <fstream>
+#include <memory>
 #include <string>
 #include <time.h>
 #include <vector>
@@ -129,6 +130,27 @@ void RecordEvents(benchmark::State& state) {
   benchmark::DoNotOptimize(store.store.flush(kLongEnough));
 }
 BENCHMARK(RecordEvents)->Iterations(400'000)->MeasureProcessCPUTime()->Unit(benchmark::kNanosecond);
+
+// Events that are real-time-communication messages, too.
+void RecordMessages(benchmark::State& state) {
+  Store store;
+  const std::vector<ValueMap> events = payloads();
+  const std::vector<EventNames> names = kinds();
+  const auto session = std::make_shared<RtcSessionRecord>();
+  std::size_t at = 0;
+  const double before = threadNanoseconds();
+  for (auto _ : state) {
+    const ValueMap& event = events[at % events.size()];
+    store.metricon.sendEvent(names[at % names.size()], [&event] { return event; });
+    store.store.record(RtcMessageRow{store.clock.now(), session, 4, 1, event, "timestamp"});
+    ++at;
+    if (at % 65'536 == 0) benchmark::DoNotOptimize(store.store.flush(kLongEnough));
+  }
+  state.counters["recording"] =
+      benchmark::Counter(threadNanoseconds() - before, benchmark::Counter::kAvgIterations);
+  benchmark::DoNotOptimize(store.store.flush(kLongEnough));
+}
+BENCHMARK(RecordMessages)->Iterations(400'000)->MeasureProcessCPUTime()->Unit(benchmark::kNanosecond);
 
 // Events that no consumer asks for.
 void RecordUnusedEvents(benchmark::State& state) {

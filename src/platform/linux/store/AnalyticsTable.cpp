@@ -10,12 +10,14 @@ namespace tonewerk {
 static_assert(kStoreNamesPerRow == 2, "an event has two names at most");
 
 AnalyticsTable::AnalyticsTable(SqliteDatabase& database) : database_(database) {
-  database.addRows("new_analytics_row", 3, *this);
-  insertRows_ = database.prepare(
-      "INSERT INTO analytics_row (recorded_at, name_set, payload) SELECT c0, c1, c2 FROM new_analytics_row");
+  database.addRows("new_analytics_row", 6, *this);
+  const std::string columns = "recorded_at, name_set, payload, rtc_session, rtc_bits";
+  const std::string values = "c1, c2, c3, c4, c5 FROM new_analytics_row";
+  insertRows_ = database.prepare("INSERT INTO analytics_row (id, " + columns + ") SELECT c0, " + values);
+  insertNextRows_ = database.prepare("INSERT INTO analytics_row (" + columns + ") SELECT " + values);
 }
 
-bool AnalyticsTable::insert(const StoreBatch& batch) {
+bool AnalyticsTable::insert(const StoreBatch& batch, const StoreNumbering& numbering) {
   if (batch.analytics().empty()) return true;
   batchSets_.clear();
   for (const EventNames& names : batch.names()) {
@@ -24,7 +26,8 @@ bool AnalyticsTable::insert(const StoreBatch& batch) {
     batchSets_.push_back(*set);
   }
   batch_ = &batch;
-  const bool inserted = insertRows_.run();
+  identifiers_ = numbering.analytics();
+  const bool inserted = (numbering.analyticsAreNext() ? insertNextRows_ : insertRows_).run();
   batch_ = nullptr;
   return inserted;
 }
@@ -35,11 +38,18 @@ void AnalyticsTable::read(std::size_t row, int column, SqliteCell& cell) const {
   const StoreBatch::Analytics& event = batch_->analytics()[row];
   switch (column) {
     case 0:
-      return cell.set(event.recordedAt);
+      return cell.set(identifiers_[row]);
     case 1:
+      return cell.set(event.recordedAt);
+    case 2:
       return cell.set(batchSets_[event.names]);
-    default:
+    case 3:
       return cell.set(batch_->text(event.payload));
+    case 4:
+      if (event.rtc) cell.set(batch_->sessions()[event.rtc->session]->place.identifier);
+      return;
+    default:
+      if (event.rtc) cell.set(rtcBits(event.rtc->category, event.rtc->type, event.rtc->hidden));
   }
 }
 

@@ -4,12 +4,14 @@
 #include <cstddef>
 #include <cstdint>
 #include <optional>
+#include <span>
 #include <unordered_map>
 #include <vector>
 
 #include "platform/linux/store/SqliteDatabase.h"
 #include "platform/linux/store/SqliteRows.h"
 #include "platform/linux/store/StoreBatch.h"
+#include "platform/linux/store/StoreNumbering.h"
 
 namespace tonewerk {
 
@@ -21,8 +23,9 @@ class AnalyticsTable final : private SqliteRows {
   // `database` outlives it. Prepares its statement. Whether that succeeded shows in the first insert().
   explicit AnalyticsTable(SqliteDatabase& database);
 
-  // Inserts the batch's analytics rows. False on failure. The database then has the problem.
-  [[nodiscard]] bool insert(const StoreBatch& batch);
+  // Inserts the batch's analytics rows under their identifiers. The sessions of those that are messages, too,
+  // are in the file. False on failure. The database then has the problem.
+  [[nodiscard]] bool insert(const StoreBatch& batch, const StoreNumbering& numbering);
 
  private:
   // The identifiers of so many name sets are remembered. When there are more, all are forgotten.
@@ -36,8 +39,10 @@ class AnalyticsTable final : private SqliteRows {
 
   SqliteDatabase& database_;
   SqliteStatement insertRows_;
-  const StoreBatch* batch_ = nullptr;    // while its rows are inserted
-  std::vector<std::int64_t> batchSets_;  // the name sets of batch_->names()
+  SqliteStatement insertNextRows_;             // those with the next identifiers
+  const StoreBatch* batch_ = nullptr;          // while its rows are inserted
+  std::span<const std::int64_t> identifiers_;  // of its rows
+  std::vector<std::int64_t> batchSets_;        // the name sets of batch_->names()
   std::unordered_map<EventNames, std::int64_t, EventNamesHash> known_;
 };
 

@@ -13,22 +13,27 @@ RtcTable::RtcTable(SqliteDatabase& database, const JsonService& json, std::uint6
       fileNumber_(fileNumber),
       insertSession_(database.prepare(
           "INSERT INTO rtc_session (started_at, session_info, user_info) VALUES (?1, ?2, ?3)")) {
-  database.addRows("new_rtc_message", 5, *this);
+  database.addRows("new_rtc_row", 6, *this);
   insertMessages_ = database.prepare(
-      "INSERT INTO rtc_message (sent_at, rtc_session, category, type, payload)"
-      " SELECT c0, c1, c2, c3, c4 FROM new_rtc_message");
+      "INSERT INTO rtc_row (id, sent_at, rtc_session, category, type, payload)"
+      " SELECT c0, c1, c2, c3, c4, c5 FROM new_rtc_row");
 }
 
 RtcTable::~RtcTable() {
   for (const auto& session : uncommitted_) session->place = {};
 }
 
-bool RtcTable::insert(const StoreBatch& batch) {
+bool RtcTable::insertSessions(const StoreBatch& batch) {
   for (const auto& session : batch.sessions()) {
     if (!has(*session) && !insertSession(session)) return false;
   }
+  return true;
+}
+
+bool RtcTable::insertMessages(const StoreBatch& batch, std::span<const std::int64_t> identifiers) {
   if (batch.rtcMessages().empty()) return true;
   batch_ = &batch;
+  identifiers_ = identifiers;
   const bool inserted = insertMessages_.run();
   batch_ = nullptr;
   return inserted;
@@ -42,12 +47,14 @@ void RtcTable::read(std::size_t row, int column, SqliteCell& cell) const {
   const StoreBatch::RtcMessage& message = batch_->rtcMessages()[row];
   switch (column) {
     case 0:
-      return cell.set(message.sentAt);
+      return cell.set(identifiers_[row]);
     case 1:
-      return cell.set(batch_->sessions()[message.session]->place.identifier);
+      return cell.set(message.sentAt);
     case 2:
-      return cell.set(static_cast<std::int64_t>(message.category));
+      return cell.set(batch_->sessions()[message.session]->place.identifier);
     case 3:
+      return cell.set(static_cast<std::int64_t>(message.category));
+    case 4:
       return cell.set(static_cast<std::int64_t>(message.type));
     default:
       return cell.set(batch_->text(message.payload));

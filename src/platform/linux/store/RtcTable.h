@@ -3,6 +3,7 @@
 
 #include <cstdint>
 #include <memory>
+#include <span>
 #include <vector>
 
 #include "platform/linux/store/SqliteDatabase.h"
@@ -28,8 +29,11 @@ class RtcTable final : private SqliteRows {
   // Takes back the place of sessions that were not committed.
   ~RtcTable() override;
 
-  // Inserts the batch's sessions and messages. False on failure. The database then has the problem.
-  [[nodiscard]] bool insert(const StoreBatch& batch);
+  // Inserts the batch's sessions, those of shared rows included. False on failure. The database then has the
+  // problem.
+  [[nodiscard]] bool insertSessions(const StoreBatch& batch);
+  // Inserts the messages that have a row of their own, under these identifiers, after their sessions.
+  [[nodiscard]] bool insertMessages(const StoreBatch& batch, std::span<const std::int64_t> identifiers);
   // The inserted rows are in the file.
   void committed();
 
@@ -44,7 +48,8 @@ class RtcTable final : private SqliteRows {
   const std::uint64_t fileNumber_;
   SqliteStatement insertSession_;
   SqliteStatement insertMessages_;
-  const StoreBatch* batch_ = nullptr;  // while its messages are inserted
+  const StoreBatch* batch_ = nullptr;          // while its messages are inserted
+  std::span<const std::int64_t> identifiers_;  // of its messages
   std::vector<std::shared_ptr<RtcSessionRecord>> uncommitted_;
 };
 

@@ -1,6 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/store/StoreBatch.h"
 
+#include <utility>
+
+#include "platform/linux/store/StoreSchema.h"
 #include "values/CompactJson.h"
 
 namespace tonewerk {
@@ -58,7 +61,8 @@ std::size_t StoreBatch::bytesOf(const RtcMessageRow& /*row*/, const StoreRowText
 }
 
 void StoreBatch::add(const AnalyticsRow& row, const StoreRowText& text) {
-  analytics_.push_back({row.recordedAt, indexOf(row.names), append(text.view())});
+  analytics_.push_back({row.recordedAt, indexOf(row.names), append(text.view()), {}});
+  shareable_ = row.payload;
   count(bytesOf(row, text));
 }
 
@@ -80,8 +84,24 @@ void StoreBatch::add(const RtcSessionRow& row, const StoreRowText& text) {
 }
 
 void StoreBatch::add(const RtcMessageRow& row, const StoreRowText& text) {
-  rtcMessages_.push_back({row.sentAt, indexOf(row.session), row.category, row.type, append(text.view())});
+  rtcMessages_.push_back(
+      {row.sentAt, indexOf(row.session), row.category, row.type, append(text.view()), analytics_.size()});
+  shareable_ = {};
   count(bytesOf(row, text));
+}
+
+bool StoreBatch::share(const RtcMessageRow& row) {
+  // All empty maps share their storage.
+  if (shareable_.empty() || !shareable_.sharesStorageWith(row.payload)) return false;
+  Analytics& event = analytics_.back();
+  const double later = row.sentAt - event.recordedAt;
+  if (later < 0.0 || later > kSameMomentSeconds) return false;
+  std::optional<JsonCut> cut(std::in_place);
+  if (!row.hidden.empty()) cut = cutOfEntry(text(event.payload), row.payload, row.hidden);
+  if (!cut || cut->begin > kMaxHiddenPlace || cut->size > kMaxHiddenBytes) return false;
+  event.rtc = Shared{indexOf(row.session), row.category, row.type, *cut};
+  shareable_ = {};
+  return true;
 }
 
 void StoreBatch::clear() {
@@ -94,6 +114,7 @@ void StoreBatch::clear() {
   sessions_.clear();
   text_.clear();
   if (text_.capacity() > kKeptBytes) std::string().swap(text_);
+  shareable_ = {};
   rows_ = 0;
   bytes_ = 0;
 }

@@ -5,11 +5,13 @@
 #include <cstddef>
 #include <cstdint>
 #include <memory>
+#include <optional>
 #include <span>
 #include <string>
 #include <string_view>
 #include <vector>
 
+#include "platform/linux/store/JsonCut.h"
 #include "platform/linux/store/StoreRow.h"
 
 namespace tonewerk {
@@ -43,7 +45,10 @@ class StoreRowText {
 // rows of a table are in the order of recording. A batch is cleared and used again, so that adding a row
 // seldom allocates. Used by one thread at a time.
 //
-// No values are kept, because freeing memory on another thread than it was allocated on is slow.
+// A message is usually recorded as an analytics event and directly after it as a real-time-communication
+// message. Both have the same payload and become one row: share().
+//
+// No values are kept but one, because freeing memory on another thread than it was allocated on is slow.
 class StoreBatch {
  public:
   // What clear() keeps at most of the text's buffer. Batches of usual rows are smaller.
@@ -54,10 +59,18 @@ class StoreBatch {
     std::size_t begin = 0;
     std::size_t size = 0;
   };
+  // What makes an analytics row a real-time-communication message, too.
+  struct Shared {
+    std::size_t session = 0;  // index in sessions()
+    std::uint16_t category = 0;
+    std::uint16_t type = 0;
+    JsonCut hidden;  // the message's payload lacks this part of the event's
+  };
   struct Analytics {
     double recordedAt = 0.0;
     std::size_t names = 0;  // index in names()
     Part payload;
+    std::optional<Shared> rtc;
   };
   struct Metric {
     double postedAt = 0.0;
@@ -76,6 +89,7 @@ class StoreBatch {
     std::uint16_t category = 0;
     std::uint16_t type = 0;
     Part payload;
+    std::size_t eventsBefore = 0;  // the number of analytics rows that were added before it
   };
 
   // The bytes that a row takes in a batch.
@@ -90,6 +104,14 @@ class StoreBatch {
   void add(const PowerRow& row, const StoreRowText& text);
   void add(const RtcSessionRow& row, const StoreRowText& text);
   void add(const RtcMessageRow& row, const StoreRowText& text);
+
+  // Makes the newest row, of the analytics events and the real-time-communication messages, a row of both.
+  // True when it is an event with the payload of `row`, recorded at most kSameMomentSeconds before. Otherwise
+  // nothing has changed, and `row` is to be added. The batch counts no more rows and bytes than before.
+  [[nodiscard]] bool share(const RtcMessageRow& row);
+
+  // A shared row has the event's time.
+  static constexpr double kSameMomentSeconds = 0.001;
 
   // Removes all rows. Keeps the memory, unless the text was exceptionally large.
   void clear();
@@ -130,6 +152,9 @@ class StoreBatch {
   std::array<std::uint32_t, kNameSlots> nameSlots_{};  // index in names_ plus 1, or 0
   std::vector<std::shared_ptr<RtcSessionRecord>> sessions_;
   std::string text_;
+  // The payload of the last analytics row, while that row can be shared. Empty otherwise. Holding it keeps
+  // its storage from being written, or used again for another message.
+  ValueMap shareable_;
   std::size_t rows_ = 0;
   std::size_t bytes_ = 0;
 };

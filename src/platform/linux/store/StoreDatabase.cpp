@@ -30,7 +30,9 @@ StoreDatabase::Result StoreDatabase::write(const StoreBatch& batch) {
 }
 
 bool StoreDatabase::insert(const StoreBatch& batch) {
-  return analytics_->insert(batch) && metrics_->insert(batch) && power_->insert(batch) && rtc_->insert(batch);
+  return numbering_->number(batch) && rtc_->insertSessions(batch) && analytics_->insert(batch, *numbering_) &&
+         metrics_->insert(batch) && power_->insert(batch) &&
+         rtc_->insertMessages(batch, numbering_->rtcMessages());
 }
 
 void StoreDatabase::setBounds(const StoreBounds& bounds) {
@@ -77,11 +79,13 @@ StoreDatabase::Result StoreDatabase::open() {
     return failWith("it was made by a newer version (schema " + std::to_string(*version) + ")");
   }
   if (*version == 0 && !prepareFile()) return fail();
+  if (*version == 1 && !database_.run(storeMigration())) return fail();
   // With this a commit costs no sync; each checkpoint makes one. A power cut loses the newest rows.
   if (!database_.run("PRAGMA journal_mode = WAL; PRAGMA synchronous = NORMAL")) return fail();
   applyBounds();
   begin_ = database_.prepare("BEGIN IMMEDIATE");
   commit_ = database_.prepare("COMMIT");
+  numbering_.emplace(database_);
   analytics_.emplace(database_);
   metrics_.emplace(database_);
   power_.emplace(database_);
@@ -135,6 +139,7 @@ void StoreDatabase::close() {
   // Statements are destroyed before their database. An open transaction is undone.
   begin_ = {};
   commit_ = {};
+  numbering_.reset();
   analytics_.reset();
   metrics_.reset();
   power_.reset();

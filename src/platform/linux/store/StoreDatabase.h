@@ -11,6 +11,7 @@
 #include "platform/linux/store/RtcTable.h"
 #include "platform/linux/store/SqliteDatabase.h"
 #include "platform/linux/store/StoreBatch.h"
+#include "platform/linux/store/StoreNumbering.h"
 #include "platform/linux/store/StoreTrimmer.h"
 
 namespace tonewerk {
@@ -65,6 +66,7 @@ class StoreDatabase {
   // Have a value while the file is open.
   SqliteStatement begin_;
   SqliteStatement commit_;
+  std::optional<StoreNumbering> numbering_;
   std::optional<AnalyticsTable> analytics_;
   std::optional<MetricTable> metrics_;
   std::optional<PowerTable> power_;

@@ -5,6 +5,11 @@
 
 namespace tonewerk {
 
+bool StoreQueue::isShared(const RtcMessageRow& row) {
+  const MutexLock lock(mutex_);
+  return filling_.share(row);
+}
+
 bool StoreQueue::waitForRoom(MutexLock& lock, std::size_t bytes, bool& hasTimedOut) {
   if (!fits(bytes) && waitsForRoom_) {
     const auto deadline = std::chrono::steady_clock::now() + limits_.hold;

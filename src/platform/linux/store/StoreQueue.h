@@ -44,6 +44,7 @@ class StoreQueue {
   // time, so that from now on rows are dropped.
   template <typename Row>
   [[nodiscard]] bool add(const Row& row) {
+    if (isShared(row)) return false;
     const StoreRowText text(row);  // the JSON is made without the lock
     const std::size_t bytes = StoreBatch::bytesOf(row, text);
     MutexLock lock(mutex_);
@@ -86,6 +87,12 @@ class StoreQueue {
   std::uint64_t lost() const;
 
  private:
+  // Whether the row has become part of one that is in the queue already, and so takes no room.
+  [[nodiscard]] bool isShared(const RtcMessageRow& row);
+  template <typename Row>
+  [[nodiscard]] bool isShared(const Row& /*row*/) {
+    return false;
+  }
   // False when the row is dropped. `hasTimedOut` is set when it waited for the whole hold time.
   bool waitForRoom(MutexLock& lock, std::size_t bytes, bool& hasTimedOut) REQUIRES(mutex_);
   // The batch for the next row.

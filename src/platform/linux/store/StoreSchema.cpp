@@ -9,7 +9,8 @@ namespace {
 // never deleted, so that identifiers only grow.
 constexpr std::string_view kTables = R"(
   CREATE TABLE analytics_row (
-    id INTEGER PRIMARY KEY, recorded_at REAL NOT NULL, name_set INTEGER NOT NULL, payload TEXT NOT NULL);
+    id INTEGER PRIMARY KEY, recorded_at REAL NOT NULL, name_set INTEGER NOT NULL, payload TEXT NOT NULL,
+    rtc_session INTEGER, rtc_bits INTEGER);
   CREATE TABLE analytics_name (
     name_set INTEGER NOT NULL, position INTEGER NOT NULL, name TEXT NOT NULL,
     PRIMARY KEY (name_set, position)) WITHOUT ROWID;
@@ -22,7 +23,7 @@ constexpr std::string_view kTables = R"(
   CREATE TABLE rtc_session (
     id INTEGER PRIMARY KEY, started_at REAL NOT NULL, session_info TEXT NOT NULL,
     user_info TEXT NOT NULL);
-  CREATE TABLE rtc_message (
+  CREATE TABLE rtc_row (
     id INTEGER PRIMARY KEY, sent_at REAL NOT NULL, rtc_session INTEGER NOT NULL,
     category INTEGER NOT NULL, type INTEGER NOT NULL, payload TEXT NOT NULL);
 )";
@@ -35,13 +36,46 @@ constexpr std::string_view kAnalyticsView = R"(
 )";
 static_assert(kStoreNamesPerRow == 2, "the view says 2");
 
+// Both parts are read by key and merged, so that messages in the order of their identifiers are not sorted.
+// The hidden part is counted in bytes: in a text substr() would count characters, from the beginning. The
+// casts give the columns of both parts the same affinity, without which SQLite would not merge.
+constexpr std::string_view kRtcView = R"(
+  CREATE VIEW rtc_message (id, sent_at, rtc_session, category, type, payload) AS
+    SELECT id, sent_at, rtc_session, category, type, payload FROM rtc_row
+    UNION ALL
+    SELECT id, recorded_at, rtc_session, CAST(rtc_bits >> 16 & 65535 AS INTEGER),
+           CAST(rtc_bits & 65535 AS INTEGER),
+           CAST(CASE WHEN rtc_bits >> 32 = 0 THEN payload
+                     ELSE substr(CAST(payload AS BLOB), 1, rtc_bits >> 40) ||
+                          substr(CAST(payload AS BLOB), (rtc_bits >> 40) + (rtc_bits >> 32 & 255) + 1)
+                     END AS TEXT)
+      FROM analytics_row WHERE rtc_session IS NOT NULL;
+)";
+
+constexpr std::string_view kFromVersion1 = R"(
+  ALTER TABLE analytics_row ADD COLUMN rtc_session INTEGER;
+  ALTER TABLE analytics_row ADD COLUMN rtc_bits INTEGER;
+  ALTER TABLE rtc_message RENAME TO rtc_row;
+)";
+
+std::string inTransaction(const std::string& sql) {
+  return "BEGIN IMMEDIATE;" + sql + "PRAGMA user_version = " + std::to_string(kStoreSchemaVersion) +
+         "; COMMIT;";
+}
+
 }  // namespace
 
 std::string storeSchema() {
-  std::string sql = "BEGIN IMMEDIATE;";
-  sql += kTables;
+  std::string sql(kTables);
   sql += kAnalyticsView;
-  return sql + "PRAGMA user_version = " + std::to_string(kStoreSchemaVersion) + "; COMMIT;";
+  sql += kRtcView;
+  return inTransaction(sql);
+}
+
+std::string storeMigration() {
+  std::string sql(kFromVersion1);
+  sql += kRtcView;
+  return inTransaction(sql);
 }
 
 }  // namespace tonewerk

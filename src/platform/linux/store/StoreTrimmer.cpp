@@ -27,10 +27,13 @@ constexpr std::int64_t kVacuumPages = 512;
 constexpr std::int64_t kSpareFreePages = 64;
 
 // Orders by identifier, which changes of the clock do not affect. The newest row stays, so that its
-// identifier is not used again: a reader that continues after the last row it saw misses none.
+// identifier is not used again: a reader that continues after the last row it saw misses none. That of
+// rtc_row may go when an analytics row has a higher identifier, because new messages are numbered above both.
 std::string oldestRows(const StoreTable& table, const std::string& columns) {
   const std::string name(table.name);
-  return "SELECT " + columns + " FROM " + name + " WHERE id < (SELECT max(id) FROM " + name + ") ORDER BY id";
+  std::string newest = "(SELECT max(id) FROM " + name + ")";
+  if (name == "rtc_row") newest = "max(" + newest + ", coalesce((SELECT max(id) FROM analytics_row), 0))";
+  return "SELECT " + columns + " FROM " + name + " WHERE id < " + newest + " ORDER BY id";
 }
 
 std::string oldestChunk(const StoreTable& table) {

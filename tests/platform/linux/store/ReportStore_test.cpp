@@ -232,7 +232,7 @@ TEST_F(ReportStoreTest, MakesTheWholeSchema) {
   recordNumbered(1);
   ASSERT_TRUE(flush());
 
-  EXPECT_EQ(number("PRAGMA user_version"), 1);
+  EXPECT_EQ(number("PRAGMA user_version"), 2);
   EXPECT_EQ(number("PRAGMA auto_vacuum"), 2);
   EXPECT_EQ(number("SELECT count(*) FROM (SELECT id, posted_at, identifier, record FROM metric)"), 0);
   EXPECT_EQ(
@@ -445,7 +445,7 @@ TEST_F(ReportStoreTest, DoesNotChangeAFileOfANewerVersion) {
   close();
   SqliteDatabase other;
   ASSERT_TRUE(other.open(file(), SqliteDatabase::Mode::kReadWrite, kLongEnough));
-  ASSERT_TRUE(other.run("PRAGMA user_version = 2"));
+  ASSERT_TRUE(other.run("PRAGMA user_version = 3"));
   other.close();
 
   open();
@@ -453,9 +453,9 @@ TEST_F(ReportStoreTest, DoesNotChangeAFileOfANewerVersion) {
   EXPECT_FALSE(flush());
   close();
   EXPECT_THAT(events(), SizeIs(1));
-  EXPECT_EQ(number("PRAGMA user_version"), 2);
+  EXPECT_EQ(number("PRAGMA user_version"), 3);
   EXPECT_THAT(errors(),
-              ElementsAre(HasSubstr("newer version (schema 2)"), HasSubstr("could not be written")));
+              ElementsAre(HasSubstr("newer version (schema 3)"), HasSubstr("could not be written")));
 }
 
 TEST_F(ReportStoreTest, DeletesRowsThatAreOlderThanTheBound) {
@@ -549,7 +549,7 @@ TEST_F(ReportStoreTest, DeletesTheOldestRowsOfEveryTable) {
   for (const std::string& time : {old, young}) {
     ASSERT_TRUE(
         other.run("INSERT INTO metric (posted_at, identifier, record) VALUES (" + time + ", 1, x'00')"));
-    ASSERT_TRUE(other.run("INSERT INTO rtc_message (sent_at, rtc_session, category, type, payload) VALUES (" +
+    ASSERT_TRUE(other.run("INSERT INTO rtc_row (sent_at, rtc_session, category, type, payload) VALUES (" +
                           time + ", 1, 1, 1, '{}')"));
   }
   other.close();

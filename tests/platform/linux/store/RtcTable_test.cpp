@@ -103,7 +103,7 @@ TEST_F(RtcTableTest, AnUndoneTransactionHasNoEffect) {
     ASSERT_TRUE(otherWriter.open(directory_.path("reports.db"), SqliteDatabase::Mode::kReadWrite,
                                  std::chrono::seconds(30)));
     ASSERT_TRUE(
-        otherWriter.run("CREATE TRIGGER refuse BEFORE INSERT ON rtc_message"
+        otherWriter.run("CREATE TRIGGER refuse BEFORE INSERT ON rtc_row"
                         " BEGIN SELECT RAISE(ABORT, 'no'); END"));
   }
   EXPECT_EQ(write(RtcSessionRow{undone}, messageOf(undone, 1)), Result::kFailed);

@@ -200,6 +200,86 @@ TEST(StoreBatchTest, KeepsTheSessionsOfMessagesThatTakeTurnsOnceInTheirOrder) {
   EXPECT_EQ(batch.rows(), 21U);
 }
 
+class SharingBatchTest : public testing::Test {
+ protected:
+  RtcMessageRow messageOf(const ValueMap& payload, double time = 5.0) const {
+    return {time, session_, 4, 3, payload, "hidden"};
+  }
+  void addEvent(const ValueMap& payload, double time = 5.0) { add(batch_, AnalyticsRow{time, "a", payload}); }
+
+  const std::shared_ptr<RtcSessionRecord> session_ = std::make_shared<RtcSessionRecord>();
+  const ValueMap payload_{{"n", 1}, {"hidden", 2}};
+  StoreBatch batch_;
+};
+
+TEST_F(SharingBatchTest, AMessageSharesTheRowOfTheEventBeforeIt) {
+  addEvent(payload_);
+  const std::size_t bytes = batch_.bytes();
+  add(batch_, MetricRow{5.0, 1, "between"});
+  const std::size_t metricBytes = batch_.bytes() - bytes;
+  EXPECT_TRUE(batch_.share(messageOf(payload_, 5.0005)));
+  ASSERT_TRUE(batch_.analytics().front().rtc);
+  const StoreBatch::Shared& shared = *batch_.analytics().front().rtc;
+  EXPECT_EQ(batch_.sessions()[shared.session], session_);
+  EXPECT_EQ(shared.category, 4);
+  EXPECT_EQ(shared.type, 3);
+  EXPECT_EQ(shared.hidden.begin, std::string_view(R"({"n":1)").size());
+  EXPECT_EQ(shared.hidden.size, std::string_view(R"(,"hidden":2)").size());
+  EXPECT_EQ(batch_.rows(), 2U);
+  EXPECT_EQ(batch_.bytes(), bytes + metricBytes);
+}
+
+TEST_F(SharingBatchTest, ARowIsSharedOnce) {
+  addEvent(payload_);
+  EXPECT_TRUE(batch_.share(messageOf(payload_)));
+  EXPECT_FALSE(batch_.share(messageOf(payload_)));
+}
+
+TEST_F(SharingBatchTest, ARowIsNotSharedWithAnotherPayload) {
+  EXPECT_FALSE(batch_.share(messageOf(payload_)));
+  addEvent(payload_);
+  EXPECT_FALSE(batch_.share(messageOf({{"n", 1}, {"hidden", 2}})));  // equal, but another message's
+  addEvent({{"n", 1}});
+  EXPECT_FALSE(batch_.share(messageOf(payload_)));  // that of the event before
+  addEvent({});
+  EXPECT_FALSE(batch_.share(messageOf({})));  // every empty payload is the same
+  EXPECT_FALSE(batch_.analytics()[0].rtc || batch_.analytics()[1].rtc || batch_.analytics()[2].rtc);
+}
+
+TEST_F(SharingBatchTest, ARowIsNotSharedWhenAnotherMessageCameBetween) {
+  addEvent(payload_);
+  add(batch_, messageOf({{"other", 1}}));
+  EXPECT_FALSE(batch_.share(messageOf(payload_)));
+}
+
+TEST_F(SharingBatchTest, ARowIsNotSharedAtAnotherTime) {
+  for (const double time : {4.9999, 5.0011}) {
+    addEvent(payload_);
+    EXPECT_FALSE(batch_.share(messageOf(payload_, time)));
+  }
+}
+
+// A change of the payload would take its storage, if the batch did not hold it.
+TEST_F(SharingBatchTest, ARowIsNotSharedWithAPayloadThatHasChangedSince) {
+  ValueMap payload{{"n", 1}};
+  addEvent(payload);
+  payload.set("n", 2);
+  EXPECT_FALSE(batch_.share(messageOf(payload)));
+}
+
+TEST_F(SharingBatchTest, ARowIsNotSharedWhenTheHiddenEntryIsNotFoundInItsText) {
+  const ValueMap payload{{"n", 1}, {"hidden", "a text"}};
+  addEvent(payload);
+  EXPECT_FALSE(batch_.share(messageOf(payload)));
+  EXPECT_TRUE(batch_.share({5.0, session_, 4, 3, payload}));  // without a hidden entry
+}
+
+TEST_F(SharingBatchTest, AClearedBatchSharesNothing) {
+  addEvent(payload_);
+  batch_.clear();
+  EXPECT_FALSE(batch_.share(messageOf(payload_)));
+}
+
 TEST(StoreBatchTest, ReleasesSessionsWhenItIsCleared) {
   StoreBatch batch;
   const auto session = std::make_shared<RtcSessionRecord>();

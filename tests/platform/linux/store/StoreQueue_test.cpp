@@ -44,6 +44,33 @@ TEST_F(StoreQueueTest, AddWaitsUntilThereIsRoom) {
   queue_.committed();
 }
 
+TEST_F(StoreQueueTest, AMessageThatSharesTheRowOfItsEventTakesNoRoom) {
+  const auto session = std::make_shared<RtcSessionRecord>();
+  for (int n = 0; n < 2; ++n) {
+    const AnalyticsRow event = row(n);
+    EXPECT_FALSE(queue_.add(event));
+    EXPECT_FALSE(queue_.add(RtcMessageRow{0.0, session, 4, 1, event.payload}));
+  }
+  ASSERT_TRUE(queue_.take(batch_, true));
+  EXPECT_EQ(batch_.rows(), 2U);
+  EXPECT_TRUE(batch_.rtcMessages().empty());
+  queue_.committed();
+  EXPECT_TRUE(queue_.flush(milliseconds(0)));  // both rows are committed, and no others are waited for
+}
+
+TEST_F(StoreQueueTest, AMessageHasARowOfItsOwnWhenTheWriterHasTakenItsEvent) {
+  const auto session = std::make_shared<RtcSessionRecord>();
+  const AnalyticsRow event = row(0);
+  EXPECT_FALSE(queue_.add(event));
+  ASSERT_TRUE(queue_.take(batch_, true));
+  EXPECT_FALSE(batch_.analytics().front().rtc);
+  EXPECT_FALSE(queue_.add(RtcMessageRow{0.0, session, 4, 1, event.payload}));
+  queue_.committed();
+  ASSERT_TRUE(queue_.take(batch_, true));
+  EXPECT_TRUE(batch_.analytics().empty());
+  EXPECT_EQ(batch_.rtcMessages().size(), 1U);
+}
+
 TEST_F(StoreQueueTest, CountsRowsUntilTheyAreCommitted) {
   EXPECT_FALSE(queue_.add(row(0)));
   EXPECT_FALSE(queue_.add(row(1)));
