@@ -44,8 +44,8 @@ class RecentMaps {
   // Returns a map of this kind whose shape is in `shapes`; null for none. Valid until the next offer().
   const Map* find(std::uint64_t kind, const ShapeTable& shapes) const;
 
-  // Takes a map that has been packed with a shape of `shapes`: its bytes, and its values one after the other. May
-  // forget others.
+  // Takes a map that has been packed with a shape of `shapes`: its bytes, and its values one after the other.
+  // May forget others.
   void offer(std::uint64_t kind, const ShapeTable& shapes, std::string_view bytes, const Shape& shape,
              std::string_view values);
 
