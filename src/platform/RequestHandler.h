@@ -81,9 +81,9 @@ class ReceivedRequests {
   virtual ~ReceivedRequests() = default;
 
   // Decodes the requests in the order of their arrival and gives them to the connection's handler, whose
-  // handleRequest() and handleMessage() run on this thread. Requests that do not fit their method are answered
-  // here. Any thread; called at most once. Those of one connection, and of all connections of one listener,
-  // are delivered one after the other.
+  // handleRequest() and handleMessage() run on this thread. Requests that do not fit their method are
+  // answered here. Any thread; called at most once. Those of one connection, and of all connections of one
+  // listener, are delivered one after the other.
   virtual void deliver() = 0;
 
   // Does the same up to the first request of which the handler does not say that it is quick. True when that

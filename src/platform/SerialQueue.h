@@ -21,8 +21,8 @@ class SerialQueue {
   virtual void async(Task work) = 0;
 
   // Runs `work` at once, on the calling thread and as the queue's own work, when nothing else runs or is
-  // queued. Returns false, without running it, otherwise; a queue may always do that. What is queued meanwhile
-  // waits, so `work` must be short. Any thread; not in the queue's own work.
+  // queued. Returns false, without running it, otherwise; a queue may always do that. What is queued
+  // meanwhile waits, so `work` must be short. Any thread; not in the queue's own work.
   template <typename Work>
   [[nodiscard]] bool runAtOnce(Work&& work) {
     if (!tryLend()) return false;
