@@ -44,7 +44,9 @@ class SharedRowTest : public testing::Test {
   }
   void open() {
     ReportStore::Limits limits;
-    limits.gather = kLongEnough;  // no batch ends between an event and its message
+    // No batch ends between an event and its message, however large they are.
+    limits.gather = kLongEnough;
+    limits.bytes = 256 << 20;
     store_ = std::make_unique<ReportStore>(directory_.path(), json_, preferences_, clock_, category_, limits);
   }
   void recordEvent(const ValueMap& payload, const EventNames& names = kNames) {
