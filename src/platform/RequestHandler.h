@@ -114,6 +114,11 @@ class RequestHandler {
   // is what the request carries; null for a method that carries none. Asked on the thread of handleRequest().
   virtual bool isQuick(std::size_t /*method*/, const IncomingMessage* /*message*/) const { return false; }
 
+  // A message for this session will be delivered soon, after kExpectedAhead others. Changes nothing: what it
+  // needs may be brought from memory meanwhile. On the thread of handleRequest().
+  static constexpr std::size_t kExpectedAhead = 3;
+  virtual void expectMessage(ReporterID /*session*/) {}
+
   // The table for the shapes of maps among the arguments; null when they are to be trees. Asked for and used
   // on the thread that delivers.
   virtual ShapeTable* shapes() { return nullptr; }

@@ -4,7 +4,9 @@
 #include <cassert>
 #include <utility>
 
+#include "session/TWReportingSession.h"
 #include "session/TWReportingUtility.h"
+#include "values/Prefetch.h"
 
 namespace tonewerk {
 
@@ -70,6 +72,17 @@ void SessionIndex::remove(ReporterID reporterID, ClientNumber client) {
     found.session = std::move(next.mapped());
   }
   if (others != others_.end() && others->second.empty()) others_.erase(others);
+}
+
+void SessionIndex::expect(ReporterID reporterID) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
+  if (used_ <= kFewSessions) return;
+  prefetch(&places_[homeOf(reporterID)]);
+  const Place& next = places_[placeOf(expected_[0])];
+  if (next.session != nullptr) next.session->prefetchItself();
+  const Place& nearest = places_[placeOf(expected_[1])];
+  if (nearest.session != nullptr) nearest.session->prefetchForMessage();
+  expected_ = {reporterID, expected_[0]};
 }
 
 SessionIndex::Session SessionIndex::find(ReporterID reporterID) const {

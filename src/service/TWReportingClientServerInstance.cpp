@@ -262,6 +262,10 @@ void TWReportingClientServerInstance::getAllReporters(ServiceRequest request) {
   });
 }
 
+void TWReportingClientServerInstance::expectMessage(ReporterID reporterID) {
+  if (index_ != nullptr) index_->expect(reporterID);
+}
+
 void TWReportingClientServerInstance::killService() {
   defaultLog(category(), "DESTROYING SERVICE");
   if (const Delegate delegate = delegate_.lock()) delegate->endProcess();

@@ -56,6 +56,7 @@ class TWReportingClientServerInstance final
   void destroyReportingSession(ReporterID reporterID, ServiceRequest request) override;
   void reporterIDValid(ReporterID reporterID, ServiceRequest request) override;
   void getAllReporters(ServiceRequest request) override;
+  void expectMessage(ReporterID reporterID) override;
   void killService() override;
   void observe(ServiceRequest request) override;
 

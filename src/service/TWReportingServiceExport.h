@@ -36,6 +36,7 @@ class TWReportingServiceExport final : public RequestHandler {
   void handleReceived(std::unique_ptr<ReceivedRequests> requests) override;
   // True for requests that only read, and for messages to one session whose type makes no worker wait.
   bool isQuick(std::size_t method, const IncomingMessage* message) const override;
+  void expectMessage(ReporterID session) override { object_->expectMessage(session); }
   ShapeTable* shapes() override { return shapes_.get(); }
   // True for the request to end the process, which does not wait for the work queue. But when the connection
   // has asked to be an onlooker and may be one by now, the answer to that comes first.

@@ -41,6 +41,8 @@ class TWReportingServiceProtocol {
   virtual void destroyReportingSession(ReporterID reporterID, ServiceRequest request) = 0;
   virtual void reporterIDValid(ReporterID reporterID, ServiceRequest request) = 0;
   virtual void getAllReporters(ServiceRequest request) = 0;
+  // A message for this session comes soon (see RequestHandler). On the work queue.
+  virtual void expectMessage(ReporterID /*reporterID*/) {}
   // Ends the process. The request is never answered.
   virtual void killService() = 0;
   // Makes the connection an onlooker: it may change nothing, and how long it lasted is not reported.

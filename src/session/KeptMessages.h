@@ -8,6 +8,7 @@
 #include "session/TWReportingSessionMessage.h"
 #include "values/IndexIterator.h"
 #include "values/PieceVector.h"
+#include "values/Prefetch.h"
 
 namespace tonewerk {
 
@@ -32,6 +33,12 @@ class KeptMessages {
   // Returns an upper bound of the bytes that add(message) takes: nothing for a payload in a chunk that is
   // there, a whole region for one that opens it.
   std::size_t bytesFor(const TWReportingSessionMessage& message) const;
+
+  // Asks the processor for the memory that add() writes.
+  void prefetchNext() const {
+    if (!empty()) prefetch(back());
+    payloads_.prefetchNext();
+  }
 
   std::size_t size() const { return messages_.size(); }
   bool empty() const { return size() == 0; }

@@ -5,6 +5,8 @@
 #include <atomic>
 #include <new>
 
+#include "values/Prefetch.h"
+
 namespace tonewerk {
 namespace {
 
@@ -70,6 +72,10 @@ class KeptPayloads::Chunk final : public PackedChunk {
 KeptPayloads::KeptPayloads() = default;
 
 KeptPayloads::~KeptPayloads() = default;
+
+void KeptPayloads::prefetchNext() const {
+  if (chunk_ != nullptr) prefetch(chunk_);  // which knows where the next payload will lie
+}
 
 ValueMap KeptPayloads::keep(const ValueMap& payload) {
   const PackedMap* map = payload.packed();

@@ -31,6 +31,8 @@ class KeptPayloads {
   // Returns a copy of a packed map that lies in a chunk. A tree and a map over kMaxMapBytes are returned as
   // they are.
   ValueMap keep(const ValueMap& payload);
+  // Asks the processor for the memory that keep() writes next.
+  void prefetchNext() const;
   // Lets go of the last region.
   void clear();
 

@@ -243,16 +243,17 @@ void TWReportingSession::forEachWorker(Order order, Visitor visit) {
   }
 }
 
-// With many sessions none of this is in a cache, and each piece would be waited for when it is used.
+void TWReportingSession::prefetchItself() const { prefetchLines(this, sizeof(*this)); }
+
 void TWReportingSession::prefetchForMessage() const {
   newest_.prefetchKinds();
   previousValues_.prefetchShapes();
+  messages_.prefetchNext();
   for (const Consumer& consumer : consumers_) prefetch(consumer.worker);
 }
 
 void TWReportingSession::sendMessage(TWReportingSessionMessage& message, const MessageReply& reply) {
   assert(TWReportingUtilityIsOnReportingServerQueue());
-  prefetchForMessage();
   ++totalMessageCount_;
   if (!completePacked(message)) {
     addMissingDates(message);

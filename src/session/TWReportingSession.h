@@ -70,6 +70,12 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   void startWorkersFromClasses(const std::vector<const TWReportingSessionWorkerClass*>& classes);
   void stop();
 
+  // Ask the processor for the memory that sendMessage() uses: for the session itself, and, when that is there,
+  // for what it refers to. The second one reads where that is without the lock, because only the work queue
+  // writes it.
+  void prefetchItself() const;
+  void prefetchForMessage() const NO_THREAD_SAFETY_ANALYSIS;
+
   // Logs how many messages were delivered but not kept since this was last logged, if there were any.
   // stop() and the destructor log it themselves.
   void logUnkeptMessages();
@@ -179,9 +185,6 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   void forEachWorker(Order order, Visitor visit) NO_THREAD_SAFETY_ANALYSIS;
   // The workers whose class has `role`.
   Workers workersWith(bool TWReportingSessionWorkerClass::*role) const;
-  // Asks the processor for the memory that sendMessage() uses. Reads where it is without the lock, because
-  // only the work queue writes that.
-  void prefetchForMessage() const NO_THREAD_SAFETY_ANALYSIS;
   void deliver(const TWReportingSessionMessage& message);
   // The bytes that the session has taken from the budget.
   std::size_t keptBytes() const;

@@ -14,12 +14,14 @@ namespace tonewerk {
 
 inline void prefetch(const void* at) { __builtin_prefetch(at); }
 
+inline void prefetchLines(const void* at, std::size_t bytes) {
+  constexpr std::size_t kLine = 64;
+  for (std::size_t line = 0; line < bytes; line += kLine) prefetch(static_cast<const char*>(at) + line);
+}
+
 // Only for a packed map, of which it reads the first `bytes`.
 inline void prefetch(const ValueMap& map, std::size_t bytes) {
-  constexpr std::size_t kLine = 64;
-  const auto* at = reinterpret_cast<const char*>(map.packed());
-  if (at == nullptr) return;
-  for (std::size_t line = 0; line < bytes; line += kLine) prefetch(at + line);
+  if (map.packed() != nullptr) prefetchLines(map.packed(), bytes);
 }
 
 }  // namespace tonewerk

@@ -62,6 +62,15 @@ IncomingMessage* RpcFrameDecoder::decodeMessage(const Frame& frame, ShapeTable& 
   return &message_;
 }
 
+std::optional<ReporterID> RpcFrameDecoder::sessionOf(const Frame& frame) {
+  if (frame.argumentCount != kMessageArguments) return std::nullopt;
+  const char* list = frame.bytes.data() + frame.arguments[3];
+  ReporterID session = 0;
+  if (encoding::byteAt(list) != (encoding::kFixedArray | 1U) || !readInteger(EncodedValue(list + 1), session))
+    return std::nullopt;
+  return session;
+}
+
 void RpcFrameDecoder::releaseMessage() {
   if (!message_.payload.empty()) message_.payload = {};  // usually it has been moved away
   if (message_.reporterIDs && message_.reporterIDs->capacity() > kMaxKeptIdentifiers) {

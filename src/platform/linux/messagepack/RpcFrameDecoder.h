@@ -38,6 +38,8 @@ class RpcFrameDecoder {
   // Decodes a request that carries a message. Null when its arguments do not fit, when a value is refused and
   // when the payload cannot be packed: decode() then says what is wrong, or makes a tree of the same values.
   IncomingMessage* decodeMessage(const Frame& frame, ShapeTable& shapes);
+  // The session of a request that carries a message for one session; none for any other.
+  static std::optional<ReporterID> sessionOf(const Frame& frame);
   // Frees what is left of the last message, but for some room for identifiers.
   void releaseMessage();
 

@@ -59,6 +59,7 @@ bool UnixRequests::deliverQuick() {
   const ReplyOutbox::Gathering replies(*context_->outbox);
   ShapeTable* const shapes = context_->handler->shapes();
   while (delivered_ < requests_.size()) {
+    lookAhead();
     if (!deliverNext(*context_->decoder, shapes, Wanted::kQuick)) return false;
   }
   return true;
@@ -66,8 +67,18 @@ bool UnixRequests::deliverQuick() {
 
 void UnixRequests::deliver(RpcFrameDecoder& decoder, ShapeTable* shapes) {
   while (delivered_ < requests_.size()) {
+    lookAhead();
     if (!deliverNext(decoder, shapes, Wanted::kAll)) return;
   }
+}
+
+void UnixRequests::lookAhead() const {
+  const std::size_t ahead = delivered_ + RequestHandler::kExpectedAhead;
+  if (ahead >= requests_.size()) return;
+  const Request& request = requests_[ahead];
+  if (!request.method || !context_->methods.methods[*request.method].carriesMessage) return;
+  if (const auto session = RpcFrameDecoder::sessionOf(request.frame))
+    context_->handler->expectMessage(*session);
 }
 
 bool UnixRequests::deliverNext(RpcFrameDecoder& decoder, ShapeTable* shapes, Wanted wanted) {

@@ -63,6 +63,8 @@ class UnixRequests final : public ReceivedRequests {
   enum class Wanted { kAll, kQuick };
 
   void deliver(RpcFrameDecoder& decoder, ShapeTable* shapes);
+  // Tells the handler of a message that comes soon.
+  void lookAhead() const;
   // False when the next request is not one of the wanted ones. It is then not delivered.
   [[nodiscard]] bool deliverNext(RpcFrameDecoder& decoder, ShapeTable* shapes, Wanted wanted);
   // Counts the next request as delivered. What is returned counts it as finished.

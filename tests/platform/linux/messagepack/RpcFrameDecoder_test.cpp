@@ -33,6 +33,12 @@ class RpcFrameDecoderTest : public ::testing::Test {
     RpcWriter(frame).request(7, requests::kSendMessage.name, arguments);
     return frame;
   }
+  static std::optional<ReporterID> sessionOf(const Arguments& arguments) {
+    const std::string frame = frameOf(arguments);
+    RpcFrameScanner scanner;
+    EXPECT_EQ(scanner.scan(frame), RpcFrameScanner::Result::kFrame);
+    return RpcFrameDecoder::sessionOf({frame, scanner.frame().argumentCount, scanner.frame().arguments});
+  }
   bool takes(const Arguments& arguments) { return decodeMessage(frameOf(arguments)) != nullptr; }
 
   RpcFrameDecoder decoder;
@@ -59,6 +65,18 @@ TEST_F(RpcFrameDecoderTest, AMessageMayNameNoSessions) {
   message = decodeMessage(frameOf({kPayload, 4, 1, Value(ValueArray())}));
   ASSERT_NE(message, nullptr);
   EXPECT_THAT(message->reporterIDs, Optional(ElementsAre()));
+}
+
+TEST_F(RpcFrameDecoderTest, TellsTheSessionOfAMessageForOneSessionAlone) {
+  EXPECT_EQ(sessionOf({kPayload, 4, 1, Value(ValueArray({7}))}), 7);
+  EXPECT_EQ(sessionOf({kPayload, 4, 1, Value(ValueArray({std::numeric_limits<std::int64_t>::min()}))}),
+            std::numeric_limits<std::int64_t>::min());
+  EXPECT_EQ(sessionOf({kPayload, 4, 1, kIdentifiers}), std::nullopt);
+  EXPECT_EQ(sessionOf({kPayload, 4, 1, Value(ValueArray())}), std::nullopt);
+  EXPECT_EQ(sessionOf({kPayload, 4, 1, std::nullopt}), std::nullopt);
+  EXPECT_EQ(sessionOf({kPayload, 4, 1, Value(ValueArray({"7"}))}), std::nullopt);
+  EXPECT_EQ(sessionOf({kPayload, 4, Value(ValueArray({7}))}), std::nullopt);
+  EXPECT_EQ(sessionOf({}), std::nullopt);
 }
 
 TEST_F(RpcFrameDecoderTest, AMessageHasNothingOfTheOneBefore) {
