@@ -70,9 +70,9 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   void startWorkersFromClasses(const std::vector<const TWReportingSessionWorkerClass*>& classes);
   void stop();
 
-  // Ask the processor for the memory that sendMessage() uses: for the session itself, and, when that is there,
-  // for what it refers to. The second one reads where that is without the lock, because only the work queue
-  // writes it.
+  // Ask the processor for the memory that sendMessage() uses: for the session itself, and, when that is
+  // there, for what it refers to. The second one reads where that is without the lock, because only the work
+  // queue writes it.
   void prefetchItself() const;
   void prefetchForMessage() const NO_THREAD_SAFETY_ANALYSIS;
 

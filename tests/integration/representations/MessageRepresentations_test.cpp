@@ -58,7 +58,7 @@ class MessageRepresentationsTest : public ReportingTest {
 
   // One way to keep messages.
   struct Side {
-    std::shared_ptr<ShapeTable> shapes;  // null for trees
+    std::shared_ptr<MessageShapes> shapes;  // null for trees
     RpcFrameDecoder decoder;
     std::shared_ptr<TWReportingSession> session;
 
