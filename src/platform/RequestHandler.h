@@ -106,12 +106,14 @@ class RequestHandler {
     handleRequest(method, message.arguments(), std::move(reply), std::move(token));
   }
 
-  // Runs on the messaging thread and must not block: delivers the requests, or sees that another thread does,
-  // in the order of these calls. A transport that decodes on its own thread calls handleRequest() instead.
+  // Runs on the messaging thread: delivers the requests that are handled soon, or sees that another thread
+  // delivers them, in the order of these calls. A transport that decodes on its own thread calls
+  // handleRequest() instead.
   virtual void handleReceived(std::unique_ptr<ReceivedRequests> requests) { requests->deliver(); }
 
-  // True when this request, whose arguments fit, is handled soon and without waiting for anything. `message`
-  // is what the request carries; null for a method that carries none. Asked on the thread of handleRequest().
+  // True when a request of this method is handled soon and without waiting. `message` is what it carries;
+  // null for a method that carries none, and for a message that cannot be packed. Asked before other
+  // arguments are decoded, on the thread of handleRequest().
   virtual bool isQuick(std::size_t /*method*/, const IncomingMessage* /*message*/) const { return false; }
 
   // A message for this session will be delivered soon, after kExpectedAhead others. Changes nothing: what it

@@ -84,12 +84,9 @@ void UnixRequests::lookAhead() const {
 bool UnixRequests::deliverNext(RpcFrameDecoder& decoder, ShapeTable* shapes, Wanted wanted) {
   const Request& request = requests_[delivered_];
   RequestHandler& handler = *context_->handler;
-  const auto isWanted = [&](const IncomingMessage* message) {
-    return wanted == Wanted::kAll || handler.isQuick(*request.method, message);
-  };
   if (shapes != nullptr && request.method && context_->methods.methods[*request.method].carriesMessage) {
     if (IncomingMessage* message = decoder.decodeMessage(request.frame, *shapes)) {
-      const bool isTaken = isWanted(message);
+      const bool isTaken = wanted == Wanted::kAll || handler.isQuick(*request.method, message);
       if (isTaken) handler.handleMessage(*request.method, *message, replyTo(request), takeNext());
       decoder.releaseMessage();
       if (isTaken) BatchScope::pieceHasRun();
@@ -97,14 +94,14 @@ bool UnixRequests::deliverNext(RpcFrameDecoder& decoder, ShapeTable* shapes, Wan
     }
     decoder.releaseMessage();
   }
+  // Before it is decoded, which may take long.
+  if (wanted == Wanted::kQuick && request.method && !handler.isQuick(*request.method, nullptr)) return false;
   RpcFrame& frame = decoder.decode(request.frame.bytes);
   if (const auto problem = problemWith(request, frame)) {
     const InFlightToken token = takeNext();
     replyTo(request)(problem);
-  } else if (isWanted(nullptr)) {
-    handler.handleRequest(*request.method, std::move(frame.arguments), replyTo(request), takeNext());
   } else {
-    return false;
+    handler.handleRequest(*request.method, std::move(frame.arguments), replyTo(request), takeNext());
   }
   BatchScope::pieceHasRun();
   return true;

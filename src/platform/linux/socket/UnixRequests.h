@@ -30,7 +30,7 @@ struct UnixRequestContext {
 };
 
 // The requests of one read from a client's socket: their bytes, and where each one is. The messaging thread
-// adds them; then they are delivered, mostly on another thread.
+// adds them; then they are delivered, there or on another thread.
 class UnixRequests final : public ReceivedRequests {
  public:
   // `bytes` are those of one read. The requests that are added lie in them or in a text of their own.

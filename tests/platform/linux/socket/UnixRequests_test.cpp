@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // Requests that are delivered later, on another thread than the one that has read them.
+#include <atomic>
 #include <chrono>
 #include <gmock/gmock.h>
 #include <memory>
@@ -14,8 +15,11 @@
 #include "platform/linux/messaging/MessagingRig.h"
 #include "platform/linux/socket/RawClient.h"
 #include "platform/linux/socket/UnixSocketListener.h"
+#include "protocol/Requests.h"
 #include "support/TemporaryDirectory.h"
 #include "support/memory/MemoryLog.h"
+#include "values/PackedMap.h"
+#include "values/ShapeTable.h"
 
 namespace tonewerk {
 namespace {
@@ -104,12 +108,49 @@ class LateHandler final : public RequestHandler {
   Deliveries& deliveries_;
 };
 
+// Keeps requests of the daemon's own set as LateHandler does. Messages of all types but kTypeError are quick.
+class MessageHandler final : public RequestHandler {
+ public:
+  explicit MessageHandler(Deliveries& deliveries) : deliveries_(deliveries) {}
+
+  void handleRequest(std::size_t method, Arguments arguments, Reply reply, InFlightToken) override {
+    deliveries_.add(
+        {std::string(requests::kAll[method].name), std::move(arguments), std::this_thread::get_id()});
+    reply(std::nullopt);
+  }
+  void handleMessage(std::size_t, IncomingMessage& message, Reply reply, InFlightToken) override {
+    EXPECT_NE(message.payload.packed(), nullptr);
+    deliveries_.add({"message", message.arguments(), std::this_thread::get_id()});
+    reply(std::nullopt);
+  }
+  void handleReceived(std::unique_ptr<ReceivedRequests> requests) override {
+    deliveries_.keep(std::move(requests));
+  }
+  bool isQuick(std::size_t, const IncomingMessage* message) const override {
+    return message != nullptr && message->type != kTypeError;
+  }
+  void expectMessage(ReporterID session) override {
+    deliveries_.add({"expect", {Value(session)}, std::this_thread::get_id()});
+  }
+  ShapeTable* shapes() override { return &shapes_; }
+
+ private:
+  Deliveries& deliveries_;
+  ShapeTable shapes_;
+};
+
 class LateDelegate final : public MessagingListenerDelegate {
  public:
   explicit LateDelegate(Deliveries& deliveries) : deliveries_(deliveries) {}
 
+  std::atomic<bool> takesMessages = false;  // of connections to come
+
   bool listenerShouldAcceptNewConnection(MessagingConnection& connection) override {
-    connection.setRequestHandler(rigInterface(), std::make_shared<LateHandler>(deliveries_));
+    if (takesMessages) {
+      connection.setRequestHandler(requests::all(), std::make_shared<MessageHandler>(deliveries_));
+    } else {
+      connection.setRequestHandler(rigInterface(), std::make_shared<LateHandler>(deliveries_));
+    }
     connection.resume();
     return true;
   }
@@ -232,6 +273,56 @@ TEST_F(UnixRequestsTest, RequestsThatAreAllQuickOrBadNeedNoSecondDelivery) {
     EXPECT_EQ(response->error.has_value(), identifier != 3);
   }
   EXPECT_THAT(deliveries.calls(), SizeIs(1));
+}
+
+std::string messageOf(std::int64_t number, AudioEventType type) {
+  return notificationOf(requests::kSendMessage.name,
+                        {ValueMap{{"number", number}}, 4, type, Value(ValueArray({number}))});
+}
+
+TEST_F(UnixRequestsTest, AMessageThatIsNotQuickIsKeptAndDeliveredWholeLater) {
+  delegate.takesMessages = true;
+  RawClient client(path);
+  ASSERT_TRUE(client.send(messageOf(1, kTypeStart) + messageOf(2, kTypeError) + messageOf(3, kTypeStart)));
+  const auto waiting = deliveries.takeWaiting();
+  ASSERT_THAT(waiting, SizeIs(1));
+  EXPECT_FALSE(waiting[0]->deliverQuick());
+  EXPECT_THAT(deliveries.methods(), ElementsAre("message"));
+  waiting[0]->deliver();
+  ASSERT_THAT(deliveries.methods(), ElementsAre("message", "message", "message"));
+  for (std::int64_t number = 1; number <= 3; ++number) {
+    const auto call = deliveries.calls()[static_cast<std::size_t>(number - 1)];
+    EXPECT_EQ(call.arguments[0], Value(ValueMap{{"number", number}}));
+    EXPECT_EQ(call.arguments[2], Value(number == 2 ? kTypeError : kTypeStart));
+  }
+}
+
+TEST_F(UnixRequestsTest, ARequestThatIsNotQuickIsNotLookedAtBeforeItsTurn) {
+  delegate.takesMessages = true;
+  RawClient client(path);
+  ASSERT_TRUE(client.send(requestOf(1, requests::kSetConfiguration.name, {Value("no map"), Value(7)})));
+  const auto waiting = deliveries.takeWaiting();
+  ASSERT_THAT(waiting, SizeIs(1));
+  EXPECT_FALSE(waiting[0]->deliverQuick());
+  waiting[0]->deliver();
+  const auto response = client.response();
+  ASSERT_TRUE(response);
+  EXPECT_TRUE(response->error.has_value());
+  EXPECT_THAT(deliveries.calls(), SizeIs(0));
+}
+
+TEST_F(UnixRequestsTest, MessagesAreExpectedAFewMessagesBeforeTheyAreDelivered) {
+  delegate.takesMessages = true;
+  RawClient client(path);
+  std::string frames;
+  for (std::int64_t number = 1; number <= 5; ++number) frames += messageOf(number, kTypeStart);
+  ASSERT_TRUE(client.send(frames));
+  const auto waiting = deliveries.takeWaiting();
+  ASSERT_THAT(waiting, SizeIs(1));
+  EXPECT_TRUE(waiting[0]->deliverQuick());
+  EXPECT_THAT(deliveries.methods(),
+              ElementsAre("expect", "message", "expect", "message", "message", "message", "message"));
+  EXPECT_EQ(deliveries.calls()[0].arguments, Arguments{Value(1 + RequestHandler::kExpectedAhead)});
 }
 
 TEST_F(UnixRequestsTest, FramesThatComeInSeveralReadsAreWhole) {
