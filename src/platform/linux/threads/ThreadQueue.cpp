@@ -61,7 +61,7 @@ void ThreadQueue::takeBack() {
   {
     const MutexLock lock(mutex_);
     isLent_ = false;
-    mustWake = !pending_.empty() && std::exchange(isWaiting_, false);
+    mustWake = (isEnding_ || !pending_.empty()) && std::exchange(isWaiting_, false);
   }
   if (mustWake) workArrived_.notifyOne();
 }

@@ -2,8 +2,10 @@
 #include "platform/linux/threads/ThreadQueue.h"
 
 #include <array>
+#include <chrono>
 #include <future>
 #include <gtest/gtest.h>
+#include <memory>
 #include <pthread.h>
 #include <string>
 #include <thread>
@@ -97,6 +99,26 @@ TEST(ThreadQueueTest, WorkThatIsQueuedMeanwhileRunsAfterwardsOnTheOwnThread) {
   queue.drain();
   EXPECT_TRUE(ranAfterwards);
   EXPECT_NE(thread, std::this_thread::get_id());
+}
+
+TEST(ThreadQueueTest, EndsAfterTheWorkThatAnotherThreadRunsAtOnce) {
+  auto queue = std::make_unique<ThreadQueue>("work", QueuePriority::kUtility);
+  std::thread end;
+  bool hasEnded = false;
+  runAtOnceWhenItWaits(*queue, [&] {
+    std::promise<void> begun;
+    end = std::thread([&] {
+      begun.set_value();
+      queue = nullptr;
+    });
+    begun.get_future().wait();
+    std::this_thread::sleep_for(
+        std::chrono::milliseconds(20));  // the end is likely to wait for this work now
+    hasEnded = true;
+  });
+  end.join();
+  EXPECT_TRUE(hasEnded);
+  EXPECT_EQ(queue, nullptr);
 }
 
 TEST(ThreadQueueTest, NeverRunsTwoPiecesAtATimeWhoeverRunsThem) {
