@@ -13,6 +13,7 @@ namespace {
 
 // A larger buffer is freed once it is empty.
 constexpr std::size_t kMaxKeptBytes = std::size_t{64} * 1024;
+constexpr std::size_t kMaxGatheredBytes = 4096;
 // With this much unsent the connection may have stopped reading requests, so it is woken when the bytes have
 // been sent.
 constexpr std::size_t kNotableBytes = std::size_t{64} * 1024;
@@ -90,7 +91,7 @@ void ReplyOutbox::takeGathered() {
     unsentBytes_ = unsent_.size() - sent_;
   }
   gathered_.clear();
-  if (gathered_.capacity() > kMaxKeptBytes) gathered_ = {};
+  if (gathered_.capacity() > kMaxGatheredBytes) gathered_ = {};
 }
 
 void ReplyOutbox::sendUnsent() {
