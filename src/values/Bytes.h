@@ -55,6 +55,21 @@ inline bool sameBytes(const char* a, const char* b, std::size_t size) {
   return true;
 }
 
+// Returns how many bytes at the start of both are the same.
+inline std::size_t commonBytes(const char* a, const char* b, std::size_t size) {
+  using Word = std::uint64_t;
+  std::size_t at = 0;
+  for (; at + sizeof(Word) <= size; at += sizeof(Word)) {
+    const Word different = loadAt<Word>(a + at) ^ loadAt<Word>(b + at);
+    if (different == 0) continue;
+    const int bits = std::endian::native == std::endian::little ? std::countr_zero(different)
+                                                                : std::countl_zero(different);
+    return at + static_cast<std::size_t>(bits) / 8;
+  }
+  while (at < size && a[at] == b[at]) ++at;
+  return at;
+}
+
 // Copies between places that do not overlap. Returns the end of the copy.
 inline char* copyBytes(char* to, const char* from, std::size_t size) {
   struct Pair {

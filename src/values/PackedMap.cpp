@@ -19,15 +19,6 @@ bool contains(PackedMap::Keys keys, std::string_view wanted) {
   return std::find(keys.begin(), keys.end(), wanted) != keys.end();
 }
 
-// Returns how many bytes at the start of both are the same.
-std::size_t commonBytes(const char* a, const char* b, std::size_t size) {
-  std::size_t at = 0;
-  while (at + sizeof(std::uint64_t) <= size && loadAt<std::uint64_t>(a + at) == loadAt<std::uint64_t>(b + at))
-    at += sizeof(std::uint64_t);
-  while (at < size && a[at] == b[at]) ++at;
-  return at;
-}
-
 // The values of a map by slot, for reading them in another order.
 std::vector<EncodedValue> valuesOf(const PackedMap& map) {
   std::vector<EncodedValue> values(map.size());

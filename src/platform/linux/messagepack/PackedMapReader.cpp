@@ -3,7 +3,6 @@
 
 #include <algorithm>
 #include <array>
-#include <bit>
 #include <cstdint>
 #include <cstring>
 #include <optional>
@@ -220,21 +219,6 @@ void copyShort(char* to, const char* from, std::size_t size, std::size_t readabl
   }
   std::memcpy(to, from, kHalf);
   if (size > kHalf) std::memcpy(to + kHalf, from + kHalf, kHalf);
-}
-
-// Returns how many bytes at the start of both are the same.
-std::size_t commonBytes(const char* a, const char* b, std::size_t size) {
-  using Word = std::uint64_t;
-  std::size_t at = 0;
-  for (; at + sizeof(Word) <= size; at += sizeof(Word)) {
-    const Word different = loadAt<Word>(a + at) ^ loadAt<Word>(b + at);
-    if (different == 0) continue;
-    const int bits = std::endian::native == std::endian::little ? std::countr_zero(different)
-                                                                : std::countl_zero(different);
-    return at + static_cast<std::size_t>(bits) / 8;
-  }
-  while (at < size && a[at] == b[at]) ++at;
-  return at;
 }
 
 // How far a map is packed.
