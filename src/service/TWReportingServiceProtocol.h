@@ -17,8 +17,8 @@ struct ServiceRequest {
 };
 
 // The requests of the daemon's request set, and the request to be an onlooker instead of a client. Called
-// on the messaging thread; the answers come from the work queue. Where an answer is a bool it is always
-// true: unknown sessions are not errors.
+// on the messaging thread or as the work queue's work; the answers come from the work queue. Where an answer
+// is a bool it is always true: unknown sessions are not errors.
 class TWReportingServiceProtocol {
  public:
   using ReporterIDs = std::optional<std::vector<ReporterID>>;

@@ -64,13 +64,13 @@ class Strand : public std::enable_shared_from_this<Strand> {
   Strand& operator=(const Strand&) = delete;
   ~Strand();
 
-  // Queues `work`, which holds `bytes`. Any thread but the pool's own, while the pool lives; only one when
-  // runAtOnce() is used, too. Pieces run in the order of their submission.
+  // Queues `work`, which holds `bytes`. Any thread but the pool's own, while the pool lives; only one serial
+  // queue when runAtOnce() is used, too. Pieces run in the order of their submission.
   void submit(std::size_t bytes, Task work);
 
   // Runs `work` on the calling thread when no piece waits before it. Returns false, without running it, when
-  // one does, or when a piece is running: submit() then keeps the order. `work` must not hold(). One thread
-  // alone calls it and submit(), while the pool lives.
+  // one does, or when a piece is running: submit() then keeps the order. `work` must not hold(). One serial
+  // queue alone calls it and submit(), while the pool lives.
   template <typename Work>
   [[nodiscard]] bool runAtOnce(Work&& work) {
     if (waitingCount_.load(std::memory_order_acquire) != 0 || isRunningHere() || !running_.try_lock()) {

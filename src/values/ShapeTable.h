@@ -110,7 +110,7 @@ class ShapeTable {
   static constexpr int kRecentBits = 7;
   static constexpr std::uint64_t kRecentFactor = 0x9E3779B97F4A7C15U;
 
-  // Fills a line of the cache.
+  // As large as a line of the cache.
   struct Node {
     std::array<char, kMaxEncodedKey> encoded{};  // the key, if it is short
     std::uint8_t encodedSize = 0;                // 0 for a long key and for the root
