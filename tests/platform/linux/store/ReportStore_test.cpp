@@ -8,14 +8,13 @@
 #include <gmock/gmock.h>
 #include <memory>
 #include <random>
-#include <signal.h>
 #include <string>
-#include <sys/resource.h>
 #include <thread>
 #include <tuple>
 #include <vector>
 
 #include "platform/Log.h"
+#include "platform/linux/store/FullDisk.h"
 #include "support/TemporaryDirectory.h"
 #include "support/manual/ManualClock.h"
 #include "support/memory/MemoryJsonService.h"
@@ -359,23 +358,6 @@ TEST_F(ReportStoreTest, MakesANewFileWhenTheFileWasRemoved) {
   ASSERT_TRUE(flush());
   EXPECT_THAT(payloads(), ElementsAre(R"({"n":1})"));
 }
-
-// The limit on a file's size simulates a full disk. It also applies to root.
-class FullDisk {
- public:
-  explicit FullDisk(rlim_t bytes) {
-    signal(SIGXFSZ, SIG_IGN);
-    getrlimit(RLIMIT_FSIZE, &before_);
-    const rlimit limit{bytes, before_.rlim_max};
-    setrlimit(RLIMIT_FSIZE, &limit);
-  }
-  FullDisk(const FullDisk&) = delete;
-  FullDisk& operator=(const FullDisk&) = delete;
-  ~FullDisk() { setrlimit(RLIMIT_FSIZE, &before_); }
-
- private:
-  rlimit before_{};
-};
 
 TEST_F(ReportStoreTest, ContinuesWhereItWasWhenAFullDiskHasRoomAgain) {
   open();
