@@ -7,21 +7,22 @@
 
 namespace tonewerk {
 
-StoreNumbering::StoreNumbering(SqliteDatabase& database)
-    : newestInTable_(database.prepare("SELECT coalesce(max(id), 0) FROM analytics_row")) {
+bool StoreNumbering::readNewest() {
+  newestInTable_ = database_.prepare("SELECT coalesce(max(id), 0) FROM analytics_row");
   const auto event = newestInTable_.firstNumber();
-  if (!event) return;
-  const auto message = database.number("SELECT coalesce(max(id), 0) FROM rtc_row");
-  if (!message) return;
+  if (!event) return false;
+  const auto message = database_.number("SELECT coalesce(max(id), 0) FROM rtc_row");
+  if (!message) return false;
   newestEvent_ = *event;
   newestMessage_ = std::max(*event, *message);
   hasRead_ = true;
+  return true;
 }
 
 bool StoreNumbering::number(const StoreBatch& batch) {
   analytics_.clear();
   rtcMessages_.clear();
-  if (!hasRead_) return false;
+  if (!hasRead_ && !readNewest()) return false;
   // Another program may have written, although it should not.
   const std::optional<std::int64_t> inTable = newestInTable_.firstNumber();
   if (!inTable) return false;

@@ -18,10 +18,11 @@ namespace tonewerk {
 // needed.
 class StoreNumbering {
  public:
-  // `database` outlives it. Reads the newest identifiers. Whether that succeeded shows in number().
-  explicit StoreNumbering(SqliteDatabase& database);
+  // `database` outlives it.
+  explicit StoreNumbering(SqliteDatabase& database) : database_(database) {}
 
-  // Numbers the rows of `batch`. False on failure. The database then has the problem.
+  // Numbers the rows of `batch`. The first call reads the newest identifiers of the file. False on failure.
+  // The database then has the problem.
   [[nodiscard]] bool number(const StoreBatch& batch);
 
   // The identifiers of the last batch's analytics(), and of its rtcMessages().
@@ -31,6 +32,9 @@ class StoreNumbering {
   bool analyticsAreNext() const { return analyticsAreNext_; }
 
  private:
+  [[nodiscard]] bool readNewest();
+
+  SqliteDatabase& database_;
   SqliteStatement newestInTable_;
   bool hasRead_ = false;
   std::int64_t newestEvent_ = 0;

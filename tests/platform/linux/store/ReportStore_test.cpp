@@ -420,6 +420,60 @@ TEST_F(ReportStoreTest, MovesADamagedDatabaseAsideAndKeepsTheRowsToBeWritten) {
   EXPECT_THAT(errors(), ElementsAre(HasSubstr("damaged")));
 }
 
+// One table is damaged, and the rest of the file can be read.
+class DamagedTableTest : public ReportStoreTest, public testing::WithParamInterface<std::string> {
+ protected:
+  // Makes a file with some rows and overwrites the first page of the table.
+  void makeDamagedFile() {
+    open();
+    recordNumbered(100);
+    ASSERT_TRUE(flush());
+    close();
+    const std::int64_t pageBytes = number("PRAGMA page_size");
+    const std::int64_t page = number("SELECT rootpage FROM sqlite_master WHERE name = '" + GetParam() + "'");
+    ASSERT_GT(page, 1);
+    std::fstream damaged(file(), std::ios::in | std::ios::out | std::ios::binary);
+    damaged.seekp((page - 1) * pageBytes);
+    damaged << std::string(static_cast<std::size_t>(pageBytes), '\xff');
+  }
+};
+
+INSTANTIATE_TEST_SUITE_P(Store, DamagedTableTest, testing::Values("analytics_row", "rtc_row"),
+                         [](const auto& info) { return info.param; });
+
+// The file is put in place while the store runs. When the store starts, the check of the age is the first to
+// use the tables and finds the damage.
+TEST_P(DamagedTableTest, TheFileIsMovedAsideWhenNewRowsAreNumbered) {
+  makeDamagedFile();
+  const std::string damaged = temporary_.path("damaged.db");
+  std::filesystem::rename(file(), damaged);
+  open();
+  ASSERT_TRUE(flush());
+  std::filesystem::remove_all(directory_);
+  std::filesystem::create_directories(directory_);
+  std::filesystem::rename(damaged, file());
+  recordNumbered(1, 1000);
+  ASSERT_TRUE(flush());
+  EXPECT_THAT(payloads(), ElementsAre(R"({"n":1000})"));
+  EXPECT_TRUE(std::filesystem::exists(file() + ".corrupt"));
+  EXPECT_THAT(errors(), ElementsAre(HasSubstr("is damaged (database disk image is malformed)")));
+}
+
+TEST_F(ReportStoreTest, ReportsWhyAFileCannotBeWrittenThatLacksATable) {
+  open();
+  ASSERT_TRUE(flush());
+  close();
+  SqliteDatabase other;
+  ASSERT_TRUE(other.open(file(), SqliteDatabase::Mode::kReadWrite, kLongEnough));
+  ASSERT_TRUE(other.run("DROP VIEW rtc_message; DROP VIEW analytics_event; DROP TABLE analytics_row"));
+  other.close();
+  open();
+  recordNumbered(1);
+  EXPECT_FALSE(flush());
+  EXPECT_THAT(errors(),
+              testing::Contains(HasSubstr("cannot write " + file() + ": no such table: analytics_row")));
+}
+
 TEST_F(ReportStoreTest, DoesNotChangeAFileOfANewerVersion) {
   open();
   recordNumbered(1);
