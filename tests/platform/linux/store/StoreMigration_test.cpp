@@ -1,9 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
+#include <cstdint>
+#include <filesystem>
 #include <gmock/gmock.h>
 #include <memory>
 #include <string>
 #include <vector>
 
+#include "platform/linux/store/FullDisk.h"
 #include "platform/linux/store/StoreDatabase.h"
 #include "platform/linux/store/StoreReader.h"
 #include "platform/linux/store/StoreSchema.h"
@@ -153,6 +156,35 @@ TEST_F(StoreMigrationTest, AFailureInTheMiddleLeavesTheOldVersion) {
   ASSERT_TRUE(file_.run("DROP TABLE rtc_row"));
   EXPECT_EQ(write(), StoreDatabase::Result::kDone);
   EXPECT_EQ(contents(), before);
+}
+
+// The disk has room for ever more pages, until it has room for all.
+TEST_F(StoreMigrationTest, AFullDiskLeavesTheOldVersionUntilThereIsRoom) {
+  const std::vector<std::string> before = contents();
+  ASSERT_THAT(before, SizeIs(8));
+  const std::uintmax_t logBytes = std::filesystem::file_size(path() + "-wal");
+  ASSERT_GT(logBytes, 0U);
+  int failures = 0;
+  for (std::uintmax_t room = 0; version() == 1; room += 4096) {
+    ASSERT_LT(room, 1U << 20);
+    StoreDatabase::Result result;
+    {
+      const FullDisk full(logBytes + room);
+      result = write();
+    }
+    if (result == StoreDatabase::Result::kDone) break;
+    ++failures;
+    EXPECT_EQ(result, StoreDatabase::Result::kFailed);
+    EXPECT_EQ(store_.problem(), "disk I/O error");
+    ASSERT_EQ(version(), 1);
+    ASSERT_EQ(contents(), before);
+    ASSERT_EQ(file_.number("SELECT count(*) FROM pragma_table_info('analytics_row')"), 4);
+    ASSERT_THAT(rows("PRAGMA integrity_check"), ElementsAre("ok"));
+  }
+  EXPECT_GT(failures, 1);
+  EXPECT_EQ(version(), kStoreSchemaVersion);
+  EXPECT_EQ(contents(), before);
+  EXPECT_THAT(rows("PRAGMA integrity_check"), ElementsAre("ok"));
 }
 
 TEST_F(StoreMigrationTest, TheReaderReadsAFileThatNoDaemonHasMigratedYet) {
