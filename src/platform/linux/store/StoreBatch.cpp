@@ -7,6 +7,9 @@
 #include "values/CompactJson.h"
 
 namespace tonewerk {
+
+static_assert(StoreBatch::kMaxSharedTextBytes <= kMaxHiddenPlace, "every place in a shared text has room");
+
 namespace {
 
 // The text of the row that this thread records.
@@ -62,7 +65,7 @@ std::size_t StoreBatch::bytesOf(const RtcMessageRow& /*row*/, const StoreRowText
 
 void StoreBatch::add(const AnalyticsRow& row, const StoreRowText& text) {
   analytics_.push_back({row.recordedAt, indexOf(row.names), append(text.view()), {}});
-  shareable_ = row.payload;
+  shareable_ = text.view().size() <= kMaxSharedTextBytes ? row.payload : ValueMap();
   count(bytesOf(row, text));
 }
 
@@ -98,7 +101,7 @@ bool StoreBatch::share(const RtcMessageRow& row) {
   if (later < 0.0 || later > kSameMomentSeconds) return false;
   std::optional<JsonCut> cut(std::in_place);
   if (!row.hidden.empty()) cut = cutOfEntry(text(event.payload), row.payload, row.hidden);
-  if (!cut || cut->begin > kMaxHiddenPlace || cut->size > kMaxHiddenBytes) return false;
+  if (!cut || cut->size > kMaxHiddenBytes) return false;
   event.rtc = Shared{indexOf(row.session), row.category, row.type, *cut};
   shareable_ = {};
   return true;

@@ -106,12 +106,18 @@ class StoreBatch {
   void add(const RtcMessageRow& row, const StoreRowText& text);
 
   // Makes the newest row, of the analytics events and the real-time-communication messages, a row of both.
-  // True when it is an event with the payload of `row`, recorded at most kSameMomentSeconds before. Otherwise
-  // nothing has changed, and `row` is to be added. The batch counts no more rows and bytes than before.
+  // True when it is an event with the payload of `row`, recorded at most kSameMomentSeconds before, and its
+  // text has at most kMaxSharedTextBytes. Otherwise nothing has changed, and `row` is to be added. The batch
+  // counts no more rows and bytes than before.
   [[nodiscard]] bool share(const RtcMessageRow& row);
+  // From now on no row that is there is shared. Call it when the batch gets no more rows: a payload that is
+  // kept for sharing takes memory of its client.
+  void endSharing() { shareable_ = {}; }
 
   // A shared row has the event's time.
   static constexpr double kSameMomentSeconds = 0.001;
+  // share() searches the event's text, while other threads wait to record.
+  static constexpr std::size_t kMaxSharedTextBytes = 64 << 10;
 
   // Removes all rows. Keeps the memory, unless the text was exceptionally large.
   void clear();

@@ -28,6 +28,7 @@ bool StoreQueue::waitForRoom(MutexLock& lock, std::size_t bytes, bool& hasTimedO
 
 StoreBatch& StoreQueue::batchWithRoom() {
   if (filling_.rows() >= limits_.batchRows || filling_.bytes() >= limits_.batchBytes) {
+    filling_.endSharing();
     full_.push_back(std::move(filling_));
     filling_ = std::exchange(spare_, StoreBatch());
   }
@@ -72,6 +73,7 @@ bool StoreQueue::take(StoreBatch& batch, bool wait) {
   }
   isWoken_ = false;
   if (full_.empty()) {
+    filling_.endSharing();
     std::swap(batch, filling_);
   } else {
     std::swap(batch, full_.front());

@@ -164,19 +164,20 @@ TEST_F(SharedRowTest, AllCategoriesAndTypesHaveRoomInARow) {
   EXPECT_EQ(number("SELECT count(*) FROM rtc_row"), "0");
 }
 
-TEST_F(SharedRowTest, AHiddenEntryThatIsTooFarOrTooLongIsLeftOutOfARowOfItsOwn) {
+TEST_F(SharedRowTest, AMessageWithALongTextOrALongHiddenEntryHasARowOfItsOwn) {
   const std::string key(kMaxHiddenBytes, 'k');
   const ValueMap longKey{{"a", 1}, {key, 2}};
   recordEvent(longKey);
   recordMessage(longKey, key);
-  // `{"t":"..."` is before the entry.
-  for (const std::size_t place : {kMaxHiddenPlace, kMaxHiddenPlace + 1}) {
-    recordBoth({{"t", std::string(place - 7, 'x')}, {"hidden", 2}});
+  // The text is `{"t":"...","hidden":2}`, and the message lacks 11 bytes of it.
+  for (const std::size_t size : {StoreBatch::kMaxSharedTextBytes, StoreBatch::kMaxSharedTextBytes + 1}) {
+    recordBoth({{"t", std::string(size - 19, 'x')}, {"hidden", 2}});
   }
+  const std::size_t longest = StoreBatch::kMaxSharedTextBytes - 11;
   EXPECT_THAT(rows("SELECT length(payload) FROM rtc_message ORDER BY id"),
-              ElementsAre("7", std::to_string(kMaxHiddenPlace + 1), std::to_string(kMaxHiddenPlace + 2)));
+              ElementsAre("7", std::to_string(longest), std::to_string(longest + 1)));
   EXPECT_THAT(rows("SELECT length(payload) FROM rtc_row ORDER BY id"),
-              ElementsAre("7", std::to_string(kMaxHiddenPlace + 2)));
+              ElementsAre("7", std::to_string(longest + 1)));
 }
 
 TEST_F(SharedRowTest, AnEventAloneIsNoMessageAndAMessageAloneIsNoEvent) {
@@ -334,6 +335,23 @@ TEST_F(SharedRowTest, TheNewestRowIsEmptyInBothViewsWhenTheBoundHasNoRoomForIt) 
   preferences_.configure("com.orvane.tonewerk.store", "max_megabytes", 1);
   store_->readBoundsAgain();
   recordBoth({{"text", std::string(2 << 20, 'x')}, {"hidden", 1.5}, {"b", 2}});
+  EXPECT_THAT(eventPayloads(), ElementsAre("{}", "{}"));
+  EXPECT_THAT(messagePayloads(), ElementsAre("{}"));
+}
+
+// A row that the store shares is too small for this. Another program may have written, although it should
+// not.
+TEST_F(SharedRowTest, ASharedRowThatIsEmptiedIsEmptyInBothViews) {
+  recordBoth({{"hidden", 1.5}, {"text", "short"}});
+  store_.reset();
+  SqliteDatabase other;
+  ASSERT_TRUE(other.open(directory_.path("reports.db"), SqliteDatabase::Mode::kReadWrite, kLongEnough));
+  ASSERT_TRUE(
+      other.run("UPDATE analytics_row SET payload = replace(payload, 'short', hex(zeroblob(1 << 20)))"));
+  other.close();
+  preferences_.configure("com.orvane.tonewerk.store", "max_megabytes", 1);
+  open();
+  store_->record(PowerRow{clock_.now(), 28, "power", {}});
   EXPECT_THAT(eventPayloads(), ElementsAre("{}", "{}"));
   EXPECT_THAT(messagePayloads(), ElementsAre("{}"));
 }

@@ -7,6 +7,8 @@
 #include <variant>
 #include <vector>
 
+#include "support/PackedMaps.h"
+
 namespace tonewerk {
 namespace {
 
@@ -272,6 +274,27 @@ TEST_F(SharingBatchTest, ARowIsNotSharedWhenTheHiddenEntryIsNotFoundInItsText) {
   addEvent(payload);
   EXPECT_FALSE(batch_.share(messageOf(payload)));
   EXPECT_TRUE(batch_.share({5.0, session_, 4, 3, payload}));  // without a hidden entry
+}
+
+TEST_F(SharingBatchTest, AnEventWithALongTextIsNeitherSharedNorHeld) {
+  for (const std::size_t size : {StoreBatch::kMaxSharedTextBytes, StoreBatch::kMaxSharedTextBytes + 1}) {
+    ShapeTable shapes;
+    const std::size_t others = std::string_view(R"({"hidden":2,"t":""})").size();
+    const ValueMap payload = packedMapOf({{"hidden", 2}, {"t", std::string(size - others, 'x')}}, shapes);
+    addEvent(payload);
+    const bool isShort = size == StoreBatch::kMaxSharedTextBytes;
+    EXPECT_EQ(batch_.analytics().back().payload.size, size);
+    EXPECT_EQ(payload.packed()->isShared(), isShort);
+    EXPECT_EQ(batch_.share(messageOf(payload)), isShort);
+  }
+}
+
+TEST_F(SharingBatchTest, ABatchWhoseSharingEndedSharesOnlyLaterRows) {
+  addEvent(payload_);
+  batch_.endSharing();
+  EXPECT_FALSE(batch_.share(messageOf(payload_)));
+  addEvent(payload_);
+  EXPECT_TRUE(batch_.share(messageOf(payload_)));
 }
 
 TEST_F(SharingBatchTest, AClearedBatchSharesNothing) {

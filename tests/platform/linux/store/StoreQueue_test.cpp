@@ -6,6 +6,8 @@
 #include <string>
 #include <vector>
 
+#include "support/PackedMaps.h"
+
 namespace tonewerk {
 namespace {
 
@@ -42,6 +44,32 @@ TEST_F(StoreQueueTest, AddWaitsUntilThereIsRoom) {
   EXPECT_EQ(batch_.rows(), 1U);
   EXPECT_EQ(queue_.takeDropped(), 0U);
   queue_.committed();
+}
+
+// A payload that is held takes memory of its client, for hours when the disk is full.
+TEST_F(StoreQueueTest, HoldsNoPayloadOfABatchThatGetsNoMoreRows) {
+  ShapeTable shapes;
+  const ValueMap first = packedMapOf({{"n", 1}}, shapes);
+  const ValueMap second = packedMapOf({{"n", 2}}, shapes);
+  const ValueMap third = packedMapOf({{"n", 3}}, shapes);
+  StoreQueue::Limits limits = small();
+  limits.rows = 3;
+  limits.batchRows = 2;
+  StoreQueue queue(limits);
+  EXPECT_FALSE(queue.add(AnalyticsRow{0.0, "a", first}));
+  EXPECT_TRUE(first.packed()->isShared());
+  EXPECT_FALSE(queue.add(AnalyticsRow{0.0, "a", second}));
+  EXPECT_FALSE(first.packed()->isShared());
+  EXPECT_TRUE(second.packed()->isShared());
+  EXPECT_FALSE(queue.add(AnalyticsRow{0.0, "a", third}));  // begins another batch
+  EXPECT_FALSE(second.packed()->isShared());
+  EXPECT_TRUE(third.packed()->isShared());
+  for (int batch = 0; batch < 2; ++batch) {
+    ASSERT_TRUE(queue.take(batch_, true));
+    queue.committed();
+  }
+  EXPECT_EQ(batch_.rows(), 1U);
+  EXPECT_FALSE(third.packed()->isShared());
 }
 
 TEST_F(StoreQueueTest, AMessageThatSharesTheRowOfItsEventTakesNoRoom) {
