@@ -5,81 +5,13 @@
 #include <filesystem>
 #include <system_error>
 
+#include "platform/linux/store/StoreQueries.h"
 #include "platform/linux/store/StoreSchema.h"
 
 namespace tonewerk {
 namespace {
 
 constexpr std::chrono::seconds kPatience{5};
-
-// The filter's conditions in the queries below. Parameters 2 to 6 are the filter's; parameter 1 is
-// kStoreNamesPerRow.
-std::string conditions(const EventFilter& filter, const std::string& name, const std::string& recordedAt) {
-  std::string sql;
-  if (filter.name) sql += " AND " + name + " GLOB ?3";
-  if (filter.since) sql += " AND " + recordedAt + " >= ?4";
-  if (filter.until) sql += " AND " + recordedAt + " <= ?5";
-  return sql;
-}
-
-// Reads the tables instead of the view, because there the rows after an identifier are found by key.
-std::string eventQuery(const EventFilter& filter) {
-  std::string sql =
-      "SELECT r.id * ?1 + n.position AS id, r.recorded_at AS recorded_at, n.name AS name, r.payload AS "
-      "payload"
-      " FROM analytics_row AS r CROSS JOIN analytics_name AS n ON n.name_set = r.name_set"
-      " WHERE r.id >= ?2 / ?1 AND r.id * ?1 + n.position > ?2";
-  sql += conditions(filter, "n.name", "r.recorded_at");
-  if (!filter.limit) return sql + " ORDER BY r.id, n.position";
-  return "SELECT * FROM (" + sql + " ORDER BY r.id DESC, n.position DESC LIMIT ?6) ORDER BY id";
-}
-
-// Returns a query for the rows of `sql`, which has a column `id`, oldest first. With a limit, the query
-// returns only that many of the newest rows.
-std::string limitedById(const std::string& sql, const EventFilter& filter) {
-  if (!filter.limit) return sql + " ORDER BY id";
-  return "SELECT * FROM (" + sql + " ORDER BY id DESC LIMIT ?6) ORDER BY id";
-}
-
-std::string powerQuery(const EventFilter& filter) {
-  const std::string sql =
-      "SELECT id, recorded_at, event_group, name, payload FROM power_event WHERE id > ?2" +
-      conditions(filter, "name", "recorded_at");
-  return limitedById(sql, filter);
-}
-
-std::string metricQuery(const EventFilter& filter) {
-  EventFilter unnamed = filter;
-  unnamed.name.reset();
-  const std::string sql = "SELECT id, posted_at, identifier, record FROM metric WHERE id > ?2" +
-                          conditions(unnamed, "", "posted_at");
-  return limitedById(sql, filter);
-}
-
-constexpr const char* kRtcServiceName = "s.user_info ->> 'kLinkReportUserInfoServiceName'";
-
-std::string rtcSessionQuery(const EventFilter& filter) {
-  const std::string sql =
-      "SELECT s.id AS id, s.started_at, s.session_info, s.user_info FROM rtc_session AS s WHERE s.id > ?2";
-  return limitedById(sql + conditions(filter, kRtcServiceName, "s.started_at"), filter);
-}
-
-// A message may still be stored when its session's row has been deleted. It then has no name. The session is
-// asked for in a condition, because the messages of a join would be sorted.
-std::string rtcMessageQuery(const EventFilter& filter) {
-  const std::string name =
-      "(SELECT " + std::string(kRtcServiceName) + " FROM rtc_session AS s WHERE s.id = rtc_session)";
-  const std::string sql =
-      "SELECT id, sent_at, rtc_session, category, type, payload FROM rtc_message WHERE id > ?2";
-  return limitedById(sql + conditions(filter, name, "sent_at"), filter);
-}
-
-std::string engineOnQuery(const EventFilter& filter) {
-  return "SELECT payload ->> 'ApplicationName', sum(payload ->> 'EngineOnDuration') AS duration, count(*)"
-         " FROM (" +
-         powerQuery(filter) +
-         ") WHERE payload ->> 'EngineOnDuration' IS NOT NULL GROUP BY 1 ORDER BY duration DESC, 1";
-}
 
 }  // namespace
 
