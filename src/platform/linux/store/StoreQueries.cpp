@@ -58,14 +58,13 @@ std::string rtcSessionQuery(const EventFilter& filter) {
   return limitedById(sql + conditions(filter, kRtcServiceName, "s.started_at"), filter);
 }
 
-// A message may still be stored when its session's row has been deleted. It then has no name. The session is
-// asked for in a condition, because the messages of a join would be sorted.
+// A message may still be stored when its session's row has been deleted. It then has no name. Because
+// the query selects `id`, SQLite merges both tables of the view by key, and sorts nothing.
 std::string rtcMessageQuery(const EventFilter& filter) {
-  const std::string name =
-      "(SELECT " + std::string(kRtcServiceName) + " FROM rtc_session AS s WHERE s.id = rtc_session)";
   const std::string sql =
-      "SELECT id, sent_at, rtc_session, category, type, payload FROM rtc_message WHERE id > ?2";
-  return limitedById(sql + conditions(filter, name, "sent_at"), filter);
+      "SELECT m.id AS id, m.sent_at, m.rtc_session, m.category, m.type, m.payload"
+      " FROM rtc_message AS m LEFT JOIN rtc_session AS s ON s.id = m.rtc_session WHERE m.id > ?2";
+  return limitedById(sql + conditions(filter, kRtcServiceName, "m.sent_at"), filter);
 }
 
 std::string engineOnQuery(const EventFilter& filter) {

@@ -5,8 +5,8 @@ namespace tonewerk {
 namespace {
 
 // The tables have few indexes, so that a commit of a single message writes a single page. An index on time
-// would cost a second page and AUTOINCREMENT a third. Instead of AUTOINCREMENT, the newest row of a table is
-// never deleted, so that identifiers only grow.
+// would cost a second page and AUTOINCREMENT a third. Instead of AUTOINCREMENT, the row with the highest
+// identifier is never deleted, so that identifiers only grow: see StoreTrimmer.
 constexpr std::string_view kTables = R"(
   CREATE TABLE analytics_row (
     id INTEGER PRIMARY KEY, recorded_at REAL NOT NULL, name_set INTEGER NOT NULL, payload TEXT NOT NULL,

@@ -168,8 +168,9 @@ std::int64_t StoreTrimmer::deleteUpTo(double time) {
   return deleted;
 }
 
-// The newest rows are never deleted and may be too large for the bound. Then this empties the largest of
-// them, because deleting all others would not help. True when it emptied one; none on failure.
+// The newest row of a table stays, with the exception that oldestRows() names, and may be too large for the
+// bound. Then this empties the largest of these rows, because deleting all others would not help. True when
+// it emptied one; none on failure.
 std::optional<bool> StoreTrimmer::emptyNewest(std::int64_t maxBytes) {
   std::int64_t sum = 0;
   std::int64_t largest = 0;

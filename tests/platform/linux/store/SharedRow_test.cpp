@@ -13,6 +13,7 @@
 #include "platform/linux/otlp/LinuxLinkReport.h"
 #include "platform/linux/store/ReportStore.h"
 #include "platform/linux/store/StoreMetricon.h"
+#include "platform/linux/store/StoreQueries.h"
 #include "platform/linux/store/StoreReader.h"
 #include "platform/linux/store/StoreSchema.h"
 #include "support/TemporaryDirectory.h"
@@ -25,6 +26,7 @@
 namespace tonewerk {
 namespace {
 
+using testing::Contains;
 using testing::Each;
 using testing::ElementsAre;
 using testing::HasSubstr;
@@ -274,13 +276,44 @@ TEST_F(SharedRowTest, AFollowerOfTheMessagesMissesNone) {
 
 TEST_F(SharedRowTest, TheMessagesAfterAnIdentifierAreFoundByKeyAndNotSorted) {
   for (int n = 0; n < 10; ++n) recordBoth({{"n", n}});
-  const auto plan = rows(
-      "EXPLAIN QUERY PLAN SELECT id, sent_at, rtc_session, category, type, payload FROM rtc_message"
-      " WHERE id > 5 ORDER BY id",
-      4);
-  EXPECT_THAT(plan, Each(Not(HasSubstr("TEMP B-TREE"))));
-  EXPECT_THAT(plan, testing::Contains(HasSubstr("SEARCH rtc_row USING INTEGER PRIMARY KEY (rowid>?)")));
-  EXPECT_THAT(plan, testing::Contains(HasSubstr("SEARCH analytics_row USING INTEGER PRIMARY KEY (rowid>?)")));
+  EventFilter named;
+  named.name = "telephony*";
+  named.since = 1.0;
+  for (const std::string& query :
+       {std::string("SELECT id, sent_at, rtc_session, category, type, payload FROM rtc_message"
+                    " WHERE id > 5 ORDER BY id"),
+        rtcMessageQuery({}), rtcMessageQuery(named)}) {
+    const auto plan = rows("EXPLAIN QUERY PLAN " + query, 4);
+    EXPECT_THAT(plan, Each(Not(HasSubstr("TEMP B-TREE")))) << query;
+    EXPECT_THAT(plan, Contains(HasSubstr("SEARCH rtc_row USING INTEGER PRIMARY KEY (rowid>?)")));
+    EXPECT_THAT(plan, Contains(HasSubstr("SEARCH analytics_row USING INTEGER PRIMARY KEY (rowid>?)")));
+  }
+}
+
+// With a limit, only the rows that are returned are turned round.
+TEST_F(SharedRowTest, TheNewestMessagesAreFoundByKey) {
+  recordBoth({{"n", 1}});
+  EventFilter filter;
+  filter.name = "telephony*";
+  filter.limit = 3;
+  const auto plan = rows("EXPLAIN QUERY PLAN " + rtcMessageQuery(filter), 4);
+  EXPECT_THAT(plan, Contains(HasSubstr("MERGE (UNION ALL)")));
+  EXPECT_THAT(plan, Contains(HasSubstr("TEMP B-TREE")).Times(1));
+}
+
+// docs/store.md says which queries sort and which read everything.
+TEST_F(SharedRowTest, AQueryInTheOrderOfTheIdentifierSortsNothingWhenItSelectsIt) {
+  recordBoth({{"n", 1}});
+  const auto sorts = [this](const std::string& query) {
+    const auto plan = rows("EXPLAIN QUERY PLAN " + query, 4);
+    return testing::Matches(Contains(HasSubstr("TEMP B-TREE")))(plan);
+  };
+  const std::string join =
+      " FROM rtc_session AS s JOIN rtc_message AS m ON m.rtc_session = s.id"
+      " WHERE s.user_info ->> 'kLinkReportUserInfoServiceName' = 'telephony_session' ORDER BY m.id";
+  EXPECT_FALSE(sorts("SELECT m.id, s.session_info ->> 'x' AS reporter, m.payload" + join));
+  EXPECT_TRUE(sorts("SELECT s.session_info ->> 'x' AS reporter, m.payload" + join));
+  EXPECT_FALSE(sorts("SELECT id FROM rtc_message ORDER BY id DESC LIMIT 1"));
 }
 
 TEST_F(SharedRowTest, TheNewestRowsByTheLimitOfTheReaderAreThoseOfBothKinds) {
@@ -329,6 +362,23 @@ TEST_F(SharedRowTest, TheNewestMessageOfAllStaysAlsoWhenItHasARowOfItsOwn) {
   open();
   recordMessage({{"alone", 5}});
   EXPECT_THAT(rows("SELECT id FROM rtc_message ORDER BY id DESC LIMIT 1"), ElementsAre("5"));
+}
+
+// The highest identifier of all stays in the file, although no message does.
+TEST_F(SharedRowTest, TheNewestMessageGoesWhenAnEventIsNewer) {
+  recordMessage({{"alone", 1}});
+  recordBoth({{"n", 2}});
+  recordEvent({{"n", 3}});
+  EXPECT_THAT(rows("SELECT id FROM rtc_message ORDER BY id"), ElementsAre("1", "2"));
+  clock_.advance(31 * 86'400.0);
+  store_->record(PowerRow{clock_.now(), 28, "power", {}});  // rows are deleted when something is written
+  EXPECT_THAT(messagePayloads(), IsEmpty());
+  EXPECT_THAT(rows("SELECT id, payload FROM analytics_row", 2), ElementsAre(R"(3 {"n":3})"));
+  EXPECT_THAT(rows("SELECT id FROM rtc_session"), ElementsAre("1"));
+  store_.reset();
+  open();
+  recordMessage({{"alone", 4}});
+  EXPECT_THAT(rows("SELECT id, payload FROM rtc_message", 2), ElementsAre(R"(4 {"alone":4})"));
 }
 
 TEST_F(SharedRowTest, TheNewestRowIsEmptyInBothViewsWhenTheBoundHasNoRoomForIt) {
