@@ -57,13 +57,10 @@ bool ThreadQueue::tryLend() {
 
 void ThreadQueue::takeBack() {
   borrower_.store(std::thread::id(), std::memory_order_relaxed);
-  bool mustWake = false;
-  {
-    const MutexLock lock(mutex_);
-    isLent_ = false;
-    mustWake = (isEnding_ || !pending_.empty()) && std::exchange(isWaiting_, false);
-  }
-  if (mustWake) workArrived_.notifyOne();
+  // Notifies with the lock, because the queue may end as soon as its own thread goes on.
+  const MutexLock lock(mutex_);
+  isLent_ = false;
+  if ((isEnding_ || !pending_.empty()) && std::exchange(isWaiting_, false)) workArrived_.notifyOne();
 }
 
 void ThreadQueue::drain() {
