@@ -448,15 +448,18 @@ TEST_P(DamagedTableTest, TheFileIsMovedAsideWhenNewRowsAreNumbered) {
   const std::string damaged = temporary_.path("damaged.db");
   std::filesystem::rename(file(), damaged);
   open();
-  ASSERT_TRUE(flush());
-  std::filesystem::remove_all(directory_);
+  recordNumbered(1);
+  ASSERT_TRUE(flush());  // the store has made its files
+  std::filesystem::rename(directory_, temporary_.path("before"));
   std::filesystem::create_directories(directory_);
   std::filesystem::rename(damaged, file());
   recordNumbered(1, 1000);
   ASSERT_TRUE(flush());
   EXPECT_THAT(payloads(), ElementsAre(R"({"n":1000})"));
   EXPECT_TRUE(std::filesystem::exists(file() + ".corrupt"));
-  EXPECT_THAT(errors(), ElementsAre(HasSubstr("is damaged (database disk image is malformed)")));
+  // Depending on the moment, a write to the old file fails first.
+  EXPECT_THAT(errors(), testing::Contains(HasSubstr("is damaged (database disk image is malformed)")));
+  EXPECT_THAT(errors(), Each(testing::Not(HasSubstr("not an error"))));
 }
 
 TEST_F(ReportStoreTest, ReportsWhyAFileCannotBeWrittenThatLacksATable) {
