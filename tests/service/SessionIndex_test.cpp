@@ -65,7 +65,7 @@ TEST_F(SessionIndexTest, AgreesWithAWalkOverTheClients) {
     return nullptr;
   };
   for (int step = 0; step < 3000; ++step) {
-    const ReporterID reporterID = random() % 6;
+    const auto reporterID = static_cast<ReporterID>(random() % 6);
     const SessionIndex::ClientNumber client = random() % 5;
     if (random() % 2 == 0) {
       const auto session = make(reporterID);
@@ -83,10 +83,11 @@ TEST_F(SessionIndexTest, AgreesWithAWalkOverTheClients) {
 TEST_F(SessionIndexTest, AgreesWithAMapOfManyIdentifiersThatComeAndGo) {
   constexpr ReporterID kIdentifiers = 600;
   std::mt19937 random(11);
+  const auto anyIdentifier = [&random] { return static_cast<ReporterID>(random() % kIdentifiers); };
   std::map<ReporterID, SessionIndex::Session> sessions;
   for (const double share : {0.9, 0.02, 0.5, 0.0}) {
     for (ReporterID step = 0; step < 3 * kIdentifiers; ++step) {
-      const ReporterID reporterID = random() % kIdentifiers;
+      const ReporterID reporterID = anyIdentifier();
       if (std::bernoulli_distribution(share)(random)) {
         sessions[reporterID] = make(reporterID);
         index.set(reporterID, 1, sessions[reporterID]);
@@ -94,7 +95,7 @@ TEST_F(SessionIndexTest, AgreesWithAMapOfManyIdentifiersThatComeAndGo) {
         sessions.erase(reporterID);
         index.remove(reporterID, 1);
       }
-      index.expect(random() % kIdentifiers);  // changes nothing, also for sessions that end meanwhile
+      index.expect(anyIdentifier());  // changes nothing, also for sessions that end meanwhile
     }
     for (ReporterID wanted = 0; wanted < kIdentifiers; ++wanted) {
       const auto found = sessions.find(wanted);

@@ -42,8 +42,10 @@ TEST_F(MessageShapesTest, CompletedIsTheShapeWithTheTagAndTheName) {
 
 // Ever new kinds take the places of others, and later come again.
 TEST_F(MessageShapesTest, EveryKindGetsItsShapeHoweverManyThereAre) {
+  constexpr std::size_t kShapes = 100;
   std::vector<ValueMap> maps;
-  for (int number = 0; number < 100; ++number) {
+  maps.reserve(kShapes);
+  for (std::size_t number = 0; number < kShapes; ++number) {
     maps.push_back(packedMapOf({{"key" + std::to_string(number), 1}}, shapes));
   }
   const std::vector<SharedString> names{"player", "recorder", "Unknown"};

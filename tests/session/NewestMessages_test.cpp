@@ -11,7 +11,8 @@ namespace {
 
 TEST(NewestMessagesTest, FindsTheNewestOfEachKindHoweverManyKindsThereAre) {
   constexpr AudioEventCategory kKinds = 3 * NewestMessages::kFew;
-  const std::vector<TWReportingSessionMessage> messages(2 * kKinds, {{}, kCategoryGeneric, kTypeStart});
+  const std::vector<TWReportingSessionMessage> messages(std::size_t{2} * kKinds,
+                                                        {{}, kCategoryGeneric, kTypeStart});
   NewestMessages newest;
   for (AudioEventCategory kind = 0; kind < kKinds; ++kind) {
     EXPECT_EQ(newest.find({kind, kTypeStart}), nullptr);

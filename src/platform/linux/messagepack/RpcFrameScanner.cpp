@@ -82,7 +82,7 @@ class ShortValues {
  private:
   // Two values whose first byte says how long they are, and the header of any.
   static constexpr std::size_t kRoomBytes =
-      2 * *std::max_element(encoding::kFixedLengths.begin(), encoding::kFixedLengths.end());
+      std::size_t{2} * *std::max_element(encoding::kFixedLengths.begin(), encoding::kFixedLengths.end());
 
   bool skipEntries(std::size_t count) {
     for (; count > 0; --count) {

@@ -230,7 +230,10 @@ TEST_F(PackedMapReaderTest, ReadsMapsOfOneKindLikeANewReader) {
     for (int round = 0; round < 10; ++round) {
       if (random.isOneIn(2)) map = random.changed(map);
       std::string bytes = random.bytesOf(map, {.forbiddenValues = random.isOneIn(5)});
-      if (random.isOneIn(5)) bytes[random.below(bytes.size())] ^= static_cast<char>(1U << random.below(8));
+      if (random.isOneIn(5)) {
+        char& byte = bytes[random.below(bytes.size())];
+        byte = static_cast<char>(static_cast<unsigned char>(byte) ^ (1U << random.below(8)));
+      }
       if (random.isOneIn(10)) bytes.pop_back();
       if (random.isOneIn(10)) bytes += '\x01';
       const std::string behind = bytes + std::string(random.below(40), '\x02');
