@@ -12,6 +12,7 @@
 #include "platform/linux/otlp/HttpClient.h"
 #include "platform/linux/otlp/LinuxLinkReport.h"
 #include "platform/linux/store/ReportStore.h"
+#include "platform/linux/store/RowsOf.h"
 #include "platform/linux/store/StoreMetricon.h"
 #include "platform/linux/store/StoreQueries.h"
 #include "platform/linux/store/StoreReader.h"
@@ -67,15 +68,7 @@ class SharedRowTest : public testing::Test {
     EXPECT_TRUE(store_ == nullptr || store_->flush(kLongEnough));
     SqliteDatabase database;
     EXPECT_TRUE(database.open(directory_.path("reports.db"), SqliteDatabase::Mode::kReadOnly, kLongEnough));
-    SqliteStatement select = database.prepare(sql);
-    EXPECT_TRUE(select) << sql << ": " << database.problem();
-    std::vector<std::string> found;
-    while (select && select.step() == SqliteStatement::Step::kRow) {
-      std::string row;
-      for (int column = 0; column < columns; ++column) row += (column > 0 ? " " : "") + select.text(column);
-      found.push_back(row);
-    }
-    return found;
+    return rowsOf(database, sql, columns);
   }
   std::vector<std::string> eventPayloads() { return rows("SELECT payload FROM analytics_event ORDER BY id"); }
   std::vector<std::string> messagePayloads() { return rows("SELECT payload FROM rtc_message ORDER BY id"); }

@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "platform/linux/store/FullDisk.h"
+#include "platform/linux/store/RowsOf.h"
 #include "platform/linux/store/StoreDatabase.h"
 #include "platform/linux/store/StoreReader.h"
 #include "platform/linux/store/StoreSchema.h"
@@ -73,15 +74,7 @@ class StoreMigrationTest : public testing::Test {
   }
   // The columns of each row, joined by spaces.
   std::vector<std::string> rows(const std::string& sql, int columns = 1) {
-    SqliteStatement select = file_.prepare(sql);
-    EXPECT_TRUE(select) << sql << ": " << file_.problem();
-    std::vector<std::string> found;
-    while (select && select.step() == SqliteStatement::Step::kRow) {
-      std::string row;
-      for (int column = 0; column < columns; ++column) row += (column > 0 ? " " : "") + select.text(column);
-      found.push_back(row);
-    }
-    return found;
+    return rowsOf(file_, sql, columns);
   }
   // Everything that a reader finds.
   std::vector<std::string> contents() {
