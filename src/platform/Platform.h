@@ -5,6 +5,7 @@
 
 namespace tonewerk {
 
+class Accounts;
 class Benchfile;
 class Capsa;
 class Chanmeter;
@@ -35,6 +36,7 @@ class WhirlcapRequest;
 // The operating system's services, as the core uses them. All of them outlive the core.
 struct Platform {
   Log& log;
+  Accounts& accounts;
   TracePoints& tracePoints;
   Clock& clock;
   SerialQueueFactory& queues;

@@ -1,7 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <cstdint>
+
 #include "platform/Platform.h"
+#include "platform/accounts/Accounts.h"
 #include "support/manual/ManualClock.h"
 #include "support/manual/ManualQueues.h"
 #include "support/manual/ManualSemaphores.h"
@@ -40,6 +43,9 @@ namespace tonewerk {
 //
 // Declare it before its users, so that it is destroyed last.
 struct TestPlatform {
+  // The user that the daemon runs as.
+  static constexpr std::uint32_t kOwner = 990;
+
   TestPlatform() = default;
   TestPlatform(const TestPlatform&) = delete;
   TestPlatform& operator=(const TestPlatform&) = delete;
@@ -63,6 +69,7 @@ struct TestPlatform {
                         SerialQueueFactory& otherQueues, Metricon& otherMetricon, LinkReport& otherLinkReport,
                         Capsa& otherCapsa) {
     return {.log = otherLog,
+            .accounts = accounts,
             .tracePoints = otherTracePoints,
             .clock = otherClock,
             .queues = otherQueues,
@@ -95,6 +102,7 @@ struct TestPlatform {
   MemoryLog log;
   MemoryTracePoints tracePoints;
   ManualClock clock;
+  Accounts accounts{kOwner, clock};
   ManualQueues queues;
   ManualTimers timers{clock};
   ManualSemaphores semaphores{clock};

@@ -3,8 +3,10 @@
 
 #include <filesystem>
 #include <string>
+#include <unistd.h>
 
 #include "platform/Log.h"
+#include "platform/accounts/Accounts.h"
 #include "platform/linux/channels/LinuxChanmeter.h"
 #include "platform/linux/commands/LinuxCommandRunner.h"
 #include "platform/linux/diagnostics/DiagnosticsStore.h"
@@ -65,6 +67,7 @@ struct LinuxPlatform::Adapters {
 
   const std::string logsDirectory;
   SystemClock clock;
+  Accounts accounts{::geteuid(), clock};
   const std::shared_ptr<RecentLines> logLines = std::make_shared<RecentLines>();
   std::unique_ptr<Log> log = std::make_unique<CondensingLog>(
       std::make_unique<RememberingLog>(makeStandardLog(clock), logLines, clock), clock);
@@ -97,6 +100,7 @@ LinuxPlatform::LinuxPlatform(const Directories& directories)
 LinuxPlatform::~LinuxPlatform() = default;
 
 Log& LinuxPlatform::log() { return *adapters_->log; }
+Accounts& LinuxPlatform::accounts() { return adapters_->accounts; }
 Clock& LinuxPlatform::clock() { return adapters_->clock; }
 SerialQueueFactory& LinuxPlatform::queues() { return adapters_->queues; }
 TimerService& LinuxPlatform::timers() { return adapters_->timers; }
@@ -119,6 +123,7 @@ Platform LinuxPlatform::platform(Metricon& metricon, Energybook& energybook, Dia
                                  LinkReport& linkReport, const Tracing& tracing) {
   Adapters& a = *adapters_;
   return {.log = *a.log,
+          .accounts = a.accounts,
           .tracePoints = a.tracePoints,
           .clock = a.clock,
           .queues = a.queues,

@@ -7,6 +7,7 @@
 
 namespace tonewerk {
 
+class Accounts;
 class AllocatorReclaimer;
 class DiagnosticsStore;
 class LinuxCapsa;
@@ -25,6 +26,7 @@ class LinuxPlatform {
   ~LinuxPlatform();
 
   Log& log();
+  Accounts& accounts();
   Clock& clock();
   SerialQueueFactory& queues();
   TimerService& timers();

@@ -1,0 +1,46 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <chrono>
+#include <cstdint>
+#include <optional>
+
+#include "values/Mutex.h"
+
+namespace tonewerk {
+
+class Clock;
+
+// Limits how many log lines somebody may cause: a number at once, and then a number each second. Counts those
+// that are held back. Any thread.
+class LineAllowance {
+ public:
+  struct Rate {
+    std::uint32_t burst;
+    std::uint32_t perSecond;
+  };
+
+  // Lines count against `all`, too, unless that is null. `clock` and `all` outlive the object.
+  LineAllowance(const Clock& clock, Rate rate, LineAllowance* all = nullptr);
+
+  // Asks to write one line. None when it is to be held back. Else how many lines were held back since the last
+  // one that was written; the caller says so when there were any.
+  [[nodiscard]] std::optional<std::uint64_t> takeLine();
+
+  // How many lines were held back in all.
+  std::uint64_t heldBack() const;
+
+ private:
+  bool hasLine() REQUIRES(mutex_);
+
+  const Clock& clock_;
+  const Rate rate_;
+  LineAllowance* const all_;
+  mutable Mutex mutex_;
+  double left_ GUARDED_BY(mutex_);
+  std::chrono::nanoseconds filledAt_ GUARDED_BY(mutex_);
+  std::uint64_t heldBack_ GUARDED_BY(mutex_) = 0;
+  std::uint64_t unsaid_ GUARDED_BY(mutex_) = 0;
+};
+
+}  // namespace tonewerk
