@@ -150,6 +150,7 @@ class Core {
 
   Platform platform() {
     return {.log = log_,
+            .accounts = doubles_.accounts,
             .tracePoints = tracePoints_,
             .clock = clock_,
             .queues = queues_,

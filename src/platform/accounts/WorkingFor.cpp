@@ -15,7 +15,9 @@ WorkingFor::WorkingFor(const std::shared_ptr<Account>& account, LineAllowance* l
 
 WorkingFor::~WorkingFor() { innermost = outer_; }
 
-std::shared_ptr<Account> WorkingFor::account() { return innermost == nullptr ? nullptr : innermost->account_; }
+std::shared_ptr<Account> WorkingFor::account() {
+  return innermost == nullptr ? nullptr : innermost->account_;
+}
 
 Account* WorkingFor::accountIfAny() { return innermost == nullptr ? nullptr : innermost->account_.get(); }
 
