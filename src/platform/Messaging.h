@@ -10,6 +10,8 @@
 
 namespace tonewerk {
 
+class Account;
+
 // A client's connection, from the view of the listener's delegate.
 //
 //   accepted -> set up by the delegate -> resumed -> requests ... -> ended
@@ -25,6 +27,8 @@ class MessagingConnection {
   // Identify the peer, as the kernel reports it.
   virtual std::int32_t processIdentifier() const = 0;
   virtual std::uint32_t userIdentifier() const = 0;  // kNoUser when the kernel reports none
+  // The account of the peer's user. It outlives the connection.
+  virtual const std::shared_ptr<Account>& account() const = 0;
 
   // For log lines.
   virtual std::string description() const = 0;

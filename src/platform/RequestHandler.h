@@ -82,12 +82,12 @@ class ReceivedRequests {
 
   // Decodes the requests in the order of their arrival and gives them to the connection's handler, whose
   // handleRequest() and handleMessage() run on this thread. Requests that do not fit their method are
-  // answered here. Any thread; called at most once. Those of one connection, and of all connections of one
-  // listener, are delivered one after the other.
-  virtual void deliver() = 0;
+  // answered here. Stops when the handler's turn is over. True when all requests are delivered; else it is to
+  // be called again. Any thread. Those of one connection, and of all connections of one listener, are
+  // delivered one after the other.
+  [[nodiscard]] virtual bool deliver() = 0;
 
-  // Does the same up to the first request of which the handler does not say that it is quick. True when that
-  // were all; else deliver() delivers the others.
+  // Does the same up to the first request of which the handler does not say that it is quick.
   [[nodiscard]] virtual bool deliverQuick() { return false; }
 };
 
@@ -109,7 +109,14 @@ class RequestHandler {
   // Runs on the messaging thread: delivers the requests that are handled soon, or sees that another thread
   // delivers them, in the order of these calls. A transport that decodes on its own thread calls
   // handleRequest() instead.
-  virtual void handleReceived(std::unique_ptr<ReceivedRequests> requests) { requests->deliver(); }
+  virtual void handleReceived(std::unique_ptr<ReceivedRequests> requests) {
+    while (!requests->deliver()) {
+    }
+  }
+
+  // True when others have waited long enough for the requests that are being delivered, so that their
+  // delivery is to stop. On the thread that delivers.
+  virtual bool isTurnOver() const { return false; }
 
   // True when a request of this method is handled soon and without waiting. `message` is what it carries;
   // null for a method that carries none, and for a message that cannot be packed. Asked before other

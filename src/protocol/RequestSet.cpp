@@ -6,7 +6,6 @@
 namespace tonewerk {
 namespace {
 
-constexpr std::uint32_t kRoot = 0;
 constexpr std::uint64_t kMaxInt64 = static_cast<std::uint64_t>(std::numeric_limits<std::int64_t>::max());
 
 // Returns whether `value` is an integer, signed or unsigned, in [minimum, maximum].
@@ -92,10 +91,10 @@ ReplyError messagingError(std::int64_t code, std::string message) {
   return ReplyError{std::string(kMessagingErrorDomain), code, std::move(message)};
 }
 
-std::optional<ReplyError> problemWithCaller(const Method& method, std::uint32_t user, std::uint32_t owner) {
-  if (!method.forOwner || user == kRoot || (user == owner && user != kNoUser)) return std::nullopt;
-  return messagingError(kNotPermitted, "not permitted: " + std::string(method.name) +
-                                           " is for the user that the daemon runs as, and root");
+std::optional<ReplyError> problemWithCaller(const Method& method, bool isTrusted) {
+  if (!method.forTrusted || isTrusted) return std::nullopt;
+  return messagingError(kNotPermitted,
+                        "not permitted: " + std::string(method.name) + " is for trusted users");
 }
 
 }  // namespace tonewerk

@@ -59,15 +59,17 @@ struct Method {
   // The most bytes that an answer may have. They count against the connection's limit as soon as the request
   // arrives, because a finished answer can no longer be refused.
   std::size_t replyBytes = 0;
-  // Only the user that the daemon runs as, and root, may call it: the answer shows more of other clients than
-  // their identifiers. Front ends that do not know their peers' users leave these methods out.
-  bool forOwner = false;
+  // Only trusted users may call it: it reaches what belongs to other users. Trusted are root, the user that
+  // the daemon runs as, and those whom the device maker names.
+  bool forTrusted = false;
   // Whether the method changes sessions or the daemon instead of only reading. A connection that only
   // observes may not call it.
   bool changesState = false;
   // Whether the parameters are those of IncomingMessage, in its order. Transports may then take a shorter
   // way, because messages come far more often than all other requests.
   bool carriesMessage = false;
+  // Front ends other than the socket leave it out.
+  bool isForSocketOnly = false;
 };
 
 // Lists the requests that a handler understands. A request names its method by the index in `methods`.
@@ -106,8 +108,7 @@ ReplyError messagingError(std::int64_t code, std::string message);
 // No user has this identifier. It stands for the user of a peer about which the kernel says nothing.
 inline constexpr std::uint32_t kNoUser = 0xFFFF'FFFF;
 
-// Returns why a peer of `user` may not call `method` in a daemon that runs as `owner`; none when it may.
-[[nodiscard]] std::optional<ReplyError> problemWithCaller(const Method& method, std::uint32_t user,
-                                                          std::uint32_t owner);
+// Returns why a peer may not call `method`; none when it may.
+[[nodiscard]] std::optional<ReplyError> problemWithCaller(const Method& method, bool isTrusted);
 
 }  // namespace tonewerk

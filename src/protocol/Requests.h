@@ -62,25 +62,28 @@ inline constexpr Method kGetAllReporters{.name = "getAllReporters",
                                          .result = {ResultType::kInt64List, "reporterIDs"},
                                          .replyBytes = kMaxReportersBytes};
 inline constexpr Method kKillService{
-    .name = "killService", .result = {ResultType::kNever, ""}, .changesState = true};
+    .name = "killService", .result = {ResultType::kNever, ""}, .forTrusted = true, .changesState = true};
 inline constexpr Method kObserve{.name = "observe", .result = kSuccess};
 
-// Requests that watch what the daemon does, for its own user and root.
+// Requests that watch what the daemon does.
 inline constexpr Method kWatchSessions{.name = "watch.sessions",
                                        .parameters = {{"first", ParameterType::kInt64}},
                                        .result = {ResultType::kAny, "sessions"},
                                        .replyBytes = kMaxSessionListingBytes,
-                                       .forOwner = true};
+                                       .forTrusted = true,
+                                       .isForSocketOnly = true};
 inline constexpr Method kWatchOpenMessages{.name = "watch.openMessages",
                                            .parameters = {{"reporterIDs", ParameterType::kInt64ListOrNone},
                                                           {"categories", ParameterType::kInt64ListOrNone},
                                                           {"types", ParameterType::kInt64ListOrNone}},
                                            .result = {ResultType::kAny, "answer"},
-                                           .forOwner = true};
+                                           .forTrusted = true,
+                                           .isForSocketOnly = true};
 inline constexpr Method kWatchNextMessages{.name = "watch.nextMessages",
                                            .result = {ResultType::kAny, "messages"},
                                            .replyBytes = kMaxMessagesBytes,
-                                           .forOwner = true};
+                                           .forTrusted = true,
+                                           .isForSocketOnly = true};
 
 // All requests, in the order in which they are listed to people.
 inline constexpr std::array kAll{kCreateReportingSession,

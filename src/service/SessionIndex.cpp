@@ -90,4 +90,10 @@ SessionIndex::Session SessionIndex::find(ReporterID reporterID) const {
   return places_[placeOf(reporterID)].session;
 }
 
+SessionIndex::Found SessionIndex::findWithClient(ReporterID reporterID) const {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
+  const Place& place = places_[placeOf(reporterID)];
+  return {place.session, place.client};
+}
+
 }  // namespace tonewerk

@@ -15,7 +15,7 @@ namespace tonewerk {
 
 class TWReportingSession;
 
-// Finds a session by its identifier among the sessions of all clients, however many there are.
+// Finds a session by its identifier among the sessions of one user's clients, however many there are.
 //
 // Several clients may use the same identifier. Then the session of the client that connected first is found.
 // Used on the work queue.
@@ -36,6 +36,13 @@ class SessionIndex {
 
   // Null for an unknown identifier.
   Session find(ReporterID reporterID) const;
+
+  // A session and its client's number; the number means nothing without a session.
+  struct Found {
+    Session session;
+    ClientNumber client = 0;
+  };
+  Found findWithClient(ReporterID reporterID) const;
 
  private:
   // A session that is found; null in a free place.

@@ -82,7 +82,7 @@ ValueMap sessionListing(const TWReportingServiceDelegateProtocol& service, std::
     if (portion.skip(sessions.size())) continue;
     for (const auto& [reporterID, session] : sessions) portion.add(*session, client->clientProcessName());
   }
-  if (const auto session = service.currentSingleMessageSession()) portion.add(*session, std::nullopt);
+  for (const auto& session : service.currentSingleMessageSessions()) portion.add(*session, std::nullopt);
   return portion.answer();
 }
 

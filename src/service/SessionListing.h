@@ -14,7 +14,7 @@ inline constexpr std::size_t kMaxListedSessions = 500;
 
 // Returns {"total", "sessions"}: how many sessions there are, and a description of each session of a
 // portion. The portion leaves out the first `first` sessions. Sessions are in the order of their clients'
-// connections, then of their identifiers; the single-message session is the last. Call it on the work
+// connections, then of their identifiers; the single-message sessions are the last. Call it on the work
 // queue.
 ValueMap sessionListing(const TWReportingServiceDelegateProtocol& service, std::size_t first);
 

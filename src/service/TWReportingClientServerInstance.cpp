@@ -8,10 +8,12 @@
 
 #include "platform/Log.h"
 #include "platform/SerialQueue.h"
+#include "platform/accounts/TurnQueue.h"
 #include "protocol/Requests.h"
 #include "service/MessageTap.h"
 #include "service/TWReportingServiceDelegateProtocol.h"
 #include "session/MessageShapes.h"
+#include "session/TWReportingContext.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionMessage.h"
 #include "session/TWReportingTracePoint.h"
@@ -34,10 +36,12 @@ ReplyError overBudget(const KeptBytesBudget& budget) {
 }  // namespace
 
 TWReportingClientServerInstance::TWReportingClientServerInstance(
-    std::int32_t processIdentifier, std::weak_ptr<TWReportingServiceDelegateProtocol> delegate)
+    std::int32_t processIdentifier, std::shared_ptr<Account> account,
+    std::weak_ptr<TWReportingServiceDelegateProtocol> delegate)
     : processIdentifier_(processIdentifier),
+      account_(std::move(account)),
       delegate_(std::move(delegate)),
-      budget_(std::make_shared<KeptBytesBudget>()),
+      budget_(std::make_shared<KeptBytesBudget>(account_)),
       shapes_(makeMessageShapes()) {
   infoLog(category(), "new client with pid %lu", processIdentifier);
 }
@@ -46,20 +50,26 @@ TWReportingClientServerInstance::~TWReportingClientServerInstance() {
   logLine(connectionLogLevel(), category(), "dealloc %i from the server client list", processIdentifier_);
 }
 
+bool TWReportingClientServerInstance::isReachedBy(const Account& requester) const {
+  return requester.user() == account_->user() || requester.isTrusted();
+}
+
 template <typename Body>
 void TWReportingClientServerInstance::onWorkQueue(ServiceRequest request, Body body) {
-  SerialQueue& queue = TWReportingUtilityGetReportingServerQueue();
-  if (queue.isCurrent()) {
-    if (const Delegate delegate = delegate_.lock()) body(*this, *delegate, request.reply);
+  if (TWReportingUtilityGetReportingServerQueue().isCurrent()) {
+    if (const Delegate delegate = delegate_.lock()) body(*this, delegate, request);
     return;
   }
-  queue.async([self = shared_from_this(), request = std::move(request), body = std::move(body)]() mutable {
-    if (const Delegate delegate = self->delegate_.lock()) body(*self, *delegate, request.reply);
-  });
+  TWReportingContext::current().turns().add(
+      account_, [self = shared_from_this(), request = std::move(request), body = std::move(body)]() mutable {
+        if (const Delegate delegate = self->delegate_.lock()) body(*self, delegate, request);
+        return TurnQueue::Progress::kDone;
+      });
 }
 
 void TWReportingClientServerInstance::createReportingSession(ReporterID reporterID, ServiceRequest request) {
-  onWorkQueue(std::move(request), [reporterID](auto& self, auto&, const Reply& reply) {
+  onWorkQueue(std::move(request), [reporterID](auto& self, const Delegate&, const ServiceRequest& request) {
+    const Reply& reply = request.reply;
     const TracedRequest traced(TWReportingTracePoint::kRequestCreate, reporterID);
     debugLog(category(), "creating session for reporter %lli", reporterID);
     const SessionMap& sessions = self.clientReportingSessionMap_;
@@ -78,7 +88,9 @@ void TWReportingClientServerInstance::createReportingSession(ReporterID reporter
 
 void TWReportingClientServerInstance::setServiceType(AudioServiceType serviceType,
                                                      ReporterID reportingSession, ServiceRequest request) {
-  onWorkQueue(std::move(request), [serviceType, reportingSession](auto& self, auto&, const Reply& reply) {
+  onWorkQueue(std::move(request), [serviceType, reportingSession](auto& self, const Delegate&,
+                                                                  const ServiceRequest& request) {
+    const Reply& reply = request.reply;
     debugLog(category(), "setting service type %i for reporter %lli", serviceType, reportingSession);
     if (const Session session = self.ownSession(reportingSession)) {
       self.changeServiceType(serviceType, session);
@@ -94,7 +106,8 @@ void TWReportingClientServerInstance::changeServiceType(AudioServiceType service
                                                         const Session& session) {
   if (session->serviceType() == serviceType) return session->setServiceType(serviceType);
   const ValueMap configuration = session->configuration();
-  // Comes first, so that the budget has room for the new session's copies, however full it is.
+  // Come first, so that the budget has room for the new session's copies, however full it is.
+  const KeptBytesBudget::Hold hold(*budget_);
   session->leaveBudget();
   const Session replacement = makeSession(session->reporterID());
   // It fits, because the old session has left the budget.
@@ -106,7 +119,8 @@ void TWReportingClientServerInstance::changeServiceType(AudioServiceType service
 
 void TWReportingClientServerInstance::getServiceNameForReporterID(ReporterID reporterID,
                                                                   ServiceRequest request) {
-  onWorkQueue(std::move(request), [reporterID](auto& self, auto&, const Reply& reply) {
+  onWorkQueue(std::move(request), [reporterID](auto& self, const Delegate&, const ServiceRequest& request) {
+    const Reply& reply = request.reply;
     debugLog(category(), "fetching seviceType");
     // Identifier 0 is answered twice, because clients rely on the first answer.
     if (reporterID == 0) reply(std::nullopt, kServiceUnknown);
@@ -119,8 +133,9 @@ void TWReportingClientServerInstance::getServiceNameForReporterID(ReporterID rep
 
 void TWReportingClientServerInstance::setConfiguration(ValueMap configuration, ReporterID reporterID,
                                                        ServiceRequest request) {
-  onWorkQueue(std::move(request), [configuration = std::move(configuration), reporterID](auto& self, auto&,
-                                                                                         const Reply& reply) {
+  onWorkQueue(std::move(request), [configuration = std::move(configuration), reporterID](
+                                      auto& self, const Delegate&, const ServiceRequest& request) {
+    const Reply& reply = request.reply;
     debugLog(category(), "setting configuration");
     const Session session = self.ownSession(reporterID);
     if (session != nullptr && !session->updateConfigurationWithContentsOfConfiguration(&configuration)) {
@@ -132,21 +147,23 @@ void TWReportingClientServerInstance::setConfiguration(ValueMap configuration, R
 
 void TWReportingClientServerInstance::startReportingSessionForID(ReporterID reporterID,
                                                                  ServiceRequest request) {
-  onWorkQueue(std::move(request), [reporterID](auto& self, auto& delegate, const Reply& reply) {
-    const TracedRequest traced(TWReportingTracePoint::kRequestStart, reporterID);
-    debugLog(category(), "starting session for reporter %lli", reporterID);
-    const Session session = self.ownSession(reporterID);
-    if (session == nullptr) return reply(std::nullopt, true);
-    if (session->started()) return;  // not answered on purpose: the first start's answer counts for both
-    session->start();
-    if (session->transactionCompleteBlock) session->transactionCompleteBlock(std::nullopt, true);
-    session->transactionCompleteBlock = [reply](const std::optional<ReplyError>& error, bool success) {
-      reply(error, success);
-    };
-    if (session->serviceType() == kServiceTest && TWReportingUtilityIsInternalBuild())
-      reply(std::nullopt, true);
-    delegate.logReportingSessions();
-  });
+  onWorkQueue(std::move(request),
+              [reporterID](auto& self, const Delegate& delegate, const ServiceRequest& request) {
+                const Reply& reply = request.reply;
+                const TracedRequest traced(TWReportingTracePoint::kRequestStart, reporterID);
+                debugLog(category(), "starting session for reporter %lli", reporterID);
+                const Session session = self.ownSession(reporterID);
+                if (session == nullptr) return reply(std::nullopt, true);
+                if (session->started())
+                  return;  // not answered on purpose: the first start's answer counts for both
+                session->start();
+                if (session->transactionCompleteBlock) session->transactionCompleteBlock(std::nullopt, true);
+                session->transactionCompleteBlock = [reply](const std::optional<ReplyError>& error,
+                                                            bool success) { reply(error, success); };
+                if (session->serviceType() == kServiceTest && TWReportingUtilityIsInternalBuild())
+                  reply(std::nullopt, true);
+                delegate->logReportingSessions();
+              });
 }
 
 void TWReportingClientServerInstance::sendMessage(ValueMap message, AudioEventCategory messageCategory,
@@ -166,81 +183,134 @@ void TWReportingClientServerInstance::sendMessage(ValueMap message, AudioEventCa
   if (TWReportingUtilityGetReportingServerQueue().isCurrent()) {
     const Delegate delegate = delegate_.lock();
     if (delegate == nullptr) return;
-    return deliver(*delegate, std::move(message), messageCategory, type, reporterIDs, request.reply);
+    return deliver(delegate, std::move(message), messageCategory, type, reporterIDs, request);
   }
-  onWorkQueue(std::move(request), [message = std::move(message), messageCategory, type, reporterIDs](
-                                      auto&, auto& delegate, const Reply& reply) mutable {
-    deliver(delegate, std::move(message), messageCategory, type, reporterIDs, reply);
-  });
+  onWorkQueue(std::move(request),
+              [message = std::move(message), messageCategory, type, reporterIDs](
+                  auto& self, const Delegate& delegate, ServiceRequest& received) mutable {
+                self.deliver(delegate, std::move(message), messageCategory, type, reporterIDs, received);
+              });
 }
 
-void TWReportingClientServerInstance::deliver(TWReportingServiceDelegateProtocol& delegate, ValueMap message,
+struct TWReportingClientServerInstance::Delivery {
+  ValueMap message;
+  AudioEventCategory messageCategory;
+  AudioEventType type;
+  std::vector<Session> sessions;
+  std::shared_ptr<TWReportingServiceDelegateProtocol> delegate;
+  std::shared_ptr<KeptBytesBudget> sender;
+  ServiceRequest request;
+  std::size_t bytes;  // of the message
+  Charge charge;      // for the sessions that are still to get it
+  std::size_t next = 0;
+
+  void send(const Session& session, ValueMap payload) const {
+    TWReportingSessionMessage record(std::move(payload), messageCategory, type);
+    session->sendMessage(record, nullptr, sender);
+    delegate->messageTap().note(*session, record);
+  }
+
+  // Sends to the next sessions until the user's turn is over.
+  TurnQueue::Progress run(const TurnQueue& turns) {
+    while (next < sessions.size()) {
+      const Session session = std::move(sessions[next++]);
+      // The last session gets the only reference and can change the message without a copy.
+      send(session, next == sessions.size() ? std::move(message) : message);
+      if (next == sessions.size() || !turns.isTurnOver()) continue;
+      charge.reduceTo(bytes * (sessions.size() - next));
+      return TurnQueue::Progress::kMore;
+    }
+    request.reply(std::nullopt);
+    return TurnQueue::Progress::kDone;
+  }
+};
+
+void TWReportingClientServerInstance::deliver(const Delegate& delegate, ValueMap message,
                                               AudioEventCategory messageCategory, AudioEventType type,
-                                              const ReporterIDs& reporterIDs, const Reply& reply) {
+                                              const ReporterIDs& reporterIDs, ServiceRequest& request) {
   const TracedRequest traced(TWReportingTracePoint::kRequestSend);
   debugLog(category(), "sending message for reporter %@", reporterIDs);
-  if (!delegate.isReportingEnabled()) {
-    return reply(ReplyError{std::string(kReportingErrorDomain), kReportingDisabled, ""});
+  if (!delegate->isReportingEnabled()) {
+    return request.reply(ReplyError{std::string(kReportingErrorDomain), kReportingDisabled, ""});
   }
-  const auto send = [&](const Session& session, ValueMap payload) {
-    TWReportingSessionMessage record(std::move(payload), messageCategory, type);
-    session->sendMessage(record);
-    delegate.messageTap().note(*session, record);
-  };
   if (reporterIDs && reporterIDs->size() == 1) {  // nearly always; without a list of sessions
     const ReporterID only = reporterIDs->front();
-    const Session session = only == 0 ? nullptr : delegate.findReportingSessionForID(only);
-    if (session != nullptr) send(session, std::move(message));
-    return reply(std::nullopt);
+    const Session session = only == 0 ? nullptr : delegate->findReportingSessionForID(only, *account_);
+    if (session != nullptr) {
+      TWReportingSessionMessage record(std::move(message), messageCategory, type);
+      session->sendMessage(record, nullptr, budget_);
+      delegate->messageTap().note(*session, record);
+    }
+    return request.reply(std::nullopt);
   }
-  std::vector<Session> sessions = delegate.findReportingSessionsForIDs(reporterIDs);
-  // The last session gets the only reference and can change the message without a copy.
-  for (std::size_t at = 0; at + 1 < sessions.size(); ++at) send(sessions[at], message);
-  if (!sessions.empty()) send(sessions.back(), std::move(message));
-  reply(std::nullopt);
+  const auto delivery =
+      std::make_shared<Delivery>(Delivery{std::move(message),
+                                          messageCategory,
+                                          type,
+                                          delegate->findReportingSessionsForIDs(reporterIDs, account_),
+                                          delegate,
+                                          budget_,
+                                          std::move(request),
+                                          0,
+                                          {}});
+  if (delivery->sessions.size() > 1) {
+    delivery->bytes = delivery->message.bytes();
+    delivery->charge =
+        Charge(account_, Resource::kUnfinishedBytes, delivery->bytes * delivery->sessions.size());
+  }
+  TurnQueue& turns = TWReportingContext::current().turns();
+  while (delivery->run(turns) == TurnQueue::Progress::kMore) {
+    TurnQueue::Piece rest = [delivery, &turns] { return delivery->run(turns); };
+    if (turns.continueFirst(rest)) return;
+  }
 }
 
 void TWReportingClientServerInstance::stopReportingSessionForID(ReporterID reporterID,
                                                                 ServiceRequest request) {
-  onWorkQueue(std::move(request), [reporterID](auto& self, auto& delegate, const Reply& reply) {
-    const TracedRequest traced(TWReportingTracePoint::kRequestStop, reporterID);
-    debugLog(category(), "stopping session for reporter %lli", reporterID);
-    if (reporterID == 0) return reply(std::nullopt, true);
-    const Session session = self.ownSession(reporterID);
-    if (session != nullptr && session->started()) {
-      session->stop();
-      if (session->transactionCompleteBlock) session->transactionCompleteBlock(std::nullopt, true);
-      session->transactionCompleteBlock = nullptr;
-      delegate.logReportingSessions();
-    } else {
-      if (session != nullptr) session->logUnkeptMessages();
-      debugLog(category(),
-               "Stop called, but session==nil or session.started==false. reporterID=%lli session=%@ "
-               "session.started=%i",
-               reporterID, session, session != nullptr && session->started());
-    }
-    debugLog(category(), "stopping %lli", reporterID);
-    reply(std::nullopt, true);
-  });
+  onWorkQueue(
+      std::move(request), [reporterID](auto& self, const Delegate& delegate, const ServiceRequest& request) {
+        const Reply& reply = request.reply;
+        const TracedRequest traced(TWReportingTracePoint::kRequestStop, reporterID);
+        debugLog(category(), "stopping session for reporter %lli", reporterID);
+        if (reporterID == 0) return reply(std::nullopt, true);
+        const Session session = self.ownSession(reporterID);
+        if (session != nullptr && session->started()) {
+          session->stop();
+          if (session->transactionCompleteBlock) session->transactionCompleteBlock(std::nullopt, true);
+          session->transactionCompleteBlock = nullptr;
+          delegate->logReportingSessions();
+        } else {
+          if (session != nullptr) session->logUnkeptMessages();
+          debugLog(category(),
+                   "Stop called, but session==nil or session.started==false. reporterID=%lli session=%@ "
+                   "session.started=%i",
+                   reporterID, session, session != nullptr && session->started());
+        }
+        debugLog(category(), "stopping %lli", reporterID);
+        reply(std::nullopt, true);
+      });
 }
 
 void TWReportingClientServerInstance::destroyReportingSession(ReporterID reporterID, ServiceRequest request) {
-  onWorkQueue(std::move(request), [reporterID](auto& self, auto& delegate, const Reply& reply) {
-    const TracedRequest traced(TWReportingTracePoint::kRequestDestroy, reporterID);
-    debugLog(category(), "destroying session for reporter %lli", reporterID);
-    if (reporterID == 0) return reply(std::nullopt, true);
-    if (const Session session = self.ownSession(reporterID)) {
-      if (session->started()) session->stop();
-      self.removeSession(reporterID);
-    }
-    debugLog(category(), "destroying %lli", reporterID);
-    delegate.logReportingSessions();
-    reply(std::nullopt, true);
-  });
+  onWorkQueue(std::move(request),
+              [reporterID](auto& self, const Delegate& delegate, const ServiceRequest& request) {
+                const Reply& reply = request.reply;
+                const TracedRequest traced(TWReportingTracePoint::kRequestDestroy, reporterID);
+                debugLog(category(), "destroying session for reporter %lli", reporterID);
+                if (reporterID == 0) return reply(std::nullopt, true);
+                if (const Session session = self.ownSession(reporterID)) {
+                  if (session->started()) session->stop();
+                  self.removeSession(reporterID);
+                }
+                debugLog(category(), "destroying %lli", reporterID);
+                delegate->logReportingSessions();
+                reply(std::nullopt, true);
+              });
 }
 
 void TWReportingClientServerInstance::reporterIDValid(ReporterID reporterID, ServiceRequest request) {
-  onWorkQueue(std::move(request), [reporterID](auto& self, auto&, const Reply& reply) {
+  onWorkQueue(std::move(request), [reporterID](auto& self, const Delegate&, const ServiceRequest& request) {
+    const Reply& reply = request.reply;
     debugLog(category(), "validating reporter %lli", reporterID);
     ValueMap validity{{TWReporterProxyKeyReporterID, 0}, {TWReporterProxyKeyServiceType, kServiceUnknown}};
     if (const Session session = self.findReportingSessionForID(reporterID, true)) {
@@ -253,9 +323,11 @@ void TWReportingClientServerInstance::reporterIDValid(ReporterID reporterID, Ser
 }
 
 void TWReportingClientServerInstance::getAllReporters(ServiceRequest request) {
-  onWorkQueue(std::move(request), [](auto&, auto& delegate, const Reply& reply) {
+  onWorkQueue(std::move(request), [](auto& self, const Delegate& delegate, const ServiceRequest& request) {
+    const Reply& reply = request.reply;
     std::vector<Value> reporters;
-    for (const auto& client : delegate.getAllClients()) {
+    for (const auto& client : delegate->getAllClients()) {
+      if (!client->isReachedBy(*self.account_)) continue;
       for (const auto& entry : client->clientReportingSessionMap_) reporters.emplace_back(entry.first);
     }
     reply(std::nullopt, ValueArray(std::move(reporters)));
@@ -273,7 +345,8 @@ void TWReportingClientServerInstance::killService() {
 
 void TWReportingClientServerInstance::observe(ServiceRequest request) {
   isOnlooker_ = true;
-  onWorkQueue(std::move(request), [](auto& self, auto&, const Reply& reply) {
+  onWorkQueue(std::move(request), [](auto& self, const Delegate&, const ServiceRequest& request) {
+    const Reply& reply = request.reply;
     debugLog(category(), "client %i looks on", self.processIdentifier_);
     reply(std::nullopt, true);
   });
@@ -284,7 +357,7 @@ TWReportingClientServerInstance::Session TWReportingClientServerInstance::findRe
   assert(TWReportingUtilityIsOnReportingServerQueue());
   if (Session own = ownSession(reporterID)) return own;
   const Delegate delegate = acrossAllClients ? delegate_.lock() : nullptr;
-  return delegate == nullptr ? nullptr : delegate->findReportingSessionForID(reporterID);
+  return delegate == nullptr ? nullptr : delegate->findReportingSessionForID(reporterID, *account_);
 }
 
 // Identifier 0 means "no session", although the map may have a session under it.
@@ -299,21 +372,26 @@ TWReportingClientServerInstance::Session TWReportingClientServerInstance::makeSe
   return TWReportingSession::initWithID(reporterID, {processIdentifier_}, budget_, shapes_);
 }
 
+// One session after the other, because a stop may take long and other users wait.
 void TWReportingClientServerInstance::handleConnectionError() {
-  TWReportingUtilityGetReportingServerQueue().async([self = shared_from_this()] {
+  TurnQueue& turns = TWReportingContext::current().turns();
+  turns.add(account_, [self = shared_from_this(), &turns, last = std::optional<ReporterID>()]() mutable {
+    using Progress = TurnQueue::Progress;
     const Delegate delegate = self->delegate_.lock();
-    if (delegate == nullptr) return;
+    if (delegate == nullptr) return Progress::kDone;
     const auto& clients = delegate->getAllClients();
-    if (std::find(clients.begin(), clients.end(), self) == clients.end()) return;
-    for (const auto& [reporterID, session] : self->clientReportingSessionMap_) {
-      if (session->started()) session->stop();
+    if (std::find(clients.begin(), clients.end(), self) == clients.end()) return Progress::kDone;
+    SessionMap& sessions = self->clientReportingSessionMap_;
+    for (auto at = last ? sessions.upper_bound(*last) : sessions.begin(); at != sessions.end(); ++at) {
+      last = at->first;
+      if (at->second->started()) at->second->stop();
+      if (turns.isTurnOver()) return Progress::kMore;
     }
-    while (!self->clientReportingSessionMap_.empty()) {
-      self->removeSession(self->clientReportingSessionMap_.begin()->first);
-    }
+    while (!sessions.empty()) self->removeSession(sessions.begin()->first);
     delegate->removeClient(*self);
     logLine(self->connectionLogLevel(), category(), "removing %i from the server client list",
             self->processIdentifier_);
+    return Progress::kDone;
   });
 }
 

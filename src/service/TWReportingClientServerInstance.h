@@ -18,6 +18,7 @@
 
 namespace tonewerk {
 
+class Account;
 class TWReportingServiceDelegateProtocol;
 class MessageShapes;
 class TWReportingSession;
@@ -37,8 +38,9 @@ class TWReportingClientServerInstance final
 
   using SessionMap = std::map<ReporterID, std::shared_ptr<TWReportingSession>>;
 
-  // The object holds `delegate` weakly. A request does nothing when the delegate is gone.
-  TWReportingClientServerInstance(std::int32_t processIdentifier,
+  // `account` is that of the client's user. The object holds `delegate` weakly. A request does nothing when
+  // the delegate is gone.
+  TWReportingClientServerInstance(std::int32_t processIdentifier, std::shared_ptr<Account> account,
                                   std::weak_ptr<TWReportingServiceDelegateProtocol> delegate);
   TWReportingClientServerInstance(const TWReportingClientServerInstance&) = delete;
   TWReportingClientServerInstance& operator=(const TWReportingClientServerInstance&) = delete;
@@ -69,6 +71,9 @@ class TWReportingClientServerInstance final
   void handleConnectionError();
 
   std::int32_t processIdentifier() const { return processIdentifier_; }
+  const std::shared_ptr<Account>& account() const { return account_; }
+  // Whether a request of this user reaches the client's sessions. Any thread.
+  bool isReachedBy(const Account& requester) const;
 
   // Whether the client has said that it is an onlooker, which changes nothing. Any thread.
   bool isOnlooker() const { return isOnlooker_; }
@@ -91,12 +96,16 @@ class TWReportingClientServerInstance final
   using Delegate = std::shared_ptr<TWReportingServiceDelegateProtocol>;
   using Session = std::shared_ptr<TWReportingSession>;
 
-  // Sends the message to the sessions, and replies. On the work queue.
-  static void deliver(TWReportingServiceDelegateProtocol& delegate, ValueMap message,
-                      AudioEventCategory messageCategory, AudioEventType type, const ReporterIDs& reporterIDs,
-                      const Reply& reply);
+  // A message on its way to several sessions.
+  struct Delivery;
 
-  // Runs `body` with this object, the delegate and the reply: at once on the work queue, else queued there.
+  // Sends the message to the sessions, and replies. On the work queue. When there are many sessions it goes
+  // on in later turns of the user, before the user's other requests.
+  void deliver(const Delegate& delegate, ValueMap message, AudioEventCategory messageCategory,
+               AudioEventType type, const ReporterIDs& reporterIDs, ServiceRequest& request);
+
+  // Runs `body` with this object, the delegate and the request: at once on the work queue, else in a turn of
+  // the user.
   template <typename Body>
   void onWorkQueue(ServiceRequest request, Body body);
 
@@ -110,6 +119,7 @@ class TWReportingClientServerInstance final
   void removeSession(ReporterID reporterID);
 
   const std::int32_t processIdentifier_;
+  const std::shared_ptr<Account> account_;
   const std::weak_ptr<TWReportingServiceDelegateProtocol> delegate_;
   const std::shared_ptr<KeptBytesBudget> budget_;
   const std::shared_ptr<MessageShapes> shapes_;

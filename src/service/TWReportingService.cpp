@@ -11,7 +11,9 @@
 #include "platform/Clock.h"
 #include "platform/Log.h"
 #include "platform/ProcessInformation.h"
-#include "platform/SerialQueue.h"
+#include "platform/accounts/Accounts.h"
+#include "platform/accounts/TurnQueue.h"
+#include "platform/accounts/WorkingFor.h"
 #include "protocol/Requests.h"
 #include "service/ClientUptime.h"
 #include "service/TWReportingClientServerInstance.h"
@@ -52,19 +54,23 @@ bool TWReportingService::listenerShouldAcceptNewConnection(MessagingConnection& 
   std::weak_ptr<TWReportingClientServerInstance> weakClient;
   {
     const MutexLock lock(mutex_);
-    auto client = std::make_shared<TWReportingClientServerInstance>(processIdentifier, weak_from_this());
+    auto client = std::make_shared<TWReportingClientServerInstance>(processIdentifier, connection.account(),
+                                                                    weak_from_this());
     weakClient = client;
-    TWReportingUtilityGetReportingServerQueue().async([this, self = weak_from_this(), weakClient] {
+    // Comes before all requests of the client, because it is the same user's work.
+    TWReportingContext::current().turns().add(client->account(), [this, self = weak_from_this(), weakClient] {
       const auto service = self.lock();
       const auto listed = weakClient.lock();
       if (service != nullptr && listed != nullptr) registerClient(listed);
+      return TurnQueue::Progress::kDone;
     });
     std::shared_ptr<ShapeTable> shapes = client->shapes();
     connection.setRequestHandler(
         requests::all(),
         std::make_shared<TWReportingServiceExport>(
-            std::move(client), std::make_unique<WatchRequests>(processIdentifier, weak_from_this()),
-            std::move(shapes)));
+            std::move(client),
+            std::make_unique<WatchRequests>(processIdentifier, connection.account(), weak_from_this()),
+            connection.account(), std::move(shapes)));
   }
   connection.setInterruptionHandler([weakClient] {
     const auto client = weakClient.lock();
@@ -91,7 +97,7 @@ MessageTap& TWReportingService::messageTap() {
 
 void TWReportingService::registerClient(const Client& client) {
   clients_.push_back(client);
-  client->listSessionsIn(sessionIndex_, ++lastClientNumber_);
+  client->listSessionsIn(directory_.indexOf(client->account()->user()), ++lastClientNumber_);
   client->setClientStartDate(now());
   client->setClientProcessName(
       TWReportingContext::current().platform().processes.processName(client->processIdentifier()));
@@ -109,11 +115,12 @@ void TWReportingService::reportClientUptime(
                    client == nullptr ? std::nullopt : client->clientProcessName());
 }
 
-TWReportingService::Session TWReportingService::findReportingSessionForID(ReporterID reporterID) {
+TWReportingService::Session TWReportingService::findReportingSessionForID(ReporterID reporterID,
+                                                                          const Account& requester) {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   const MutexLock lock(mutex_);
   if (reporterID == 0 || !reportingEnabled_) return nullptr;
-  Session session = sessionIndex_->find(reporterID);
+  Session session = directory_.find(reporterID, requester);
   if (session == nullptr) {
     errorLog(category(), "failed to find reporting session %lli", reporterID);
     return nullptr;
@@ -123,10 +130,12 @@ TWReportingService::Session TWReportingService::findReportingSessionForID(Report
   return session;
 }
 
-std::vector<TWReportingService::Session> TWReportingService::getAllActiveReportingSessions() {
+std::vector<TWReportingService::Session> TWReportingService::getAllActiveReportingSessions(
+    const Account& requester) {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   std::vector<Session> active;
   for (const Client& client : clients_) {
+    if (!client->isReachedBy(requester)) continue;
     const auto& sessions = client->clientReportingSessionMap();
     debugLog(category(), "sessions for client %i : %@", client->processIdentifier(), [&sessions] {
       std::string list;
@@ -141,28 +150,51 @@ std::vector<TWReportingService::Session> TWReportingService::getAllActiveReporti
   return active;
 }
 
-std::vector<TWReportingService::Session> TWReportingService::findReportingSessionsForIDs(
-    const std::optional<std::vector<ReporterID>>& reporterIDs) {
-  assert(TWReportingUtilityIsOnReportingServerQueue());
-  if (reporterIDs && !reporterIDs->empty()) {
-    std::vector<Session> found;
-    for (const ReporterID reporterID : *reporterIDs) {
-      if (reporterID == 0) continue;
-      if (Session session = findReportingSessionForID(reporterID)) found.push_back(std::move(session));
+// A list of unknown identifiers is one line in the log, however long it is.
+std::vector<TWReportingService::Session> TWReportingService::findSessions(
+    const std::vector<ReporterID>& reporterIDs, const Account& requester) {
+  std::vector<Session> found;
+  if (!reportingEnabled_) return found;
+  const MutexLock lock(mutex_);
+  std::optional<ReporterID> firstUnknown;
+  std::size_t others = 0;
+  for (const ReporterID reporterID : reporterIDs) {
+    if (reporterID == 0) continue;
+    if (Session session = directory_.find(reporterID, requester)) {
+      infoLog(category(), "found reporting session %lli for client %i", reporterID,
+              session->processIdentifiers().front());
+      found.push_back(std::move(session));
+    } else if (firstUnknown) {
+      ++others;
+    } else {
+      firstUnknown = reporterID;
     }
-    return found;
   }
-  std::vector<Session> active = getAllActiveReportingSessions();
-  logReportingSessions();
-  if (!active.empty()) return active;
-  return {singleMessageSession()};
+  if (firstUnknown && others > 0) {
+    errorLog(category(), "failed to find reporting session %lli and %zu others", *firstUnknown, others);
+  } else if (firstUnknown) {
+    errorLog(category(), "failed to find reporting session %lli", *firstUnknown);
+  }
+  return found;
 }
 
-TWReportingService::Session TWReportingService::singleMessageSession() {
+std::vector<TWReportingService::Session> TWReportingService::findReportingSessionsForIDs(
+    const std::optional<std::vector<ReporterID>>& reporterIDs, const std::shared_ptr<Account>& requester) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
+  if (reporterIDs && !reporterIDs->empty()) return findSessions(*reporterIDs, *requester);
+  std::vector<Session> active = getAllActiveReportingSessions(*requester);
+  logReportingSessions();
+  if (!active.empty()) return active;
+  return {singleMessageSession(requester)};
+}
+
+TWReportingService::Session TWReportingService::singleMessageSession(const std::shared_ptr<Account>& user) {
   const MutexLock lock(singleMessageMutex_);
-  if (singleMessageSession_ == nullptr) {
+  SingleMessage& single = singleMessages_[user->user()];
+  if (single.session == nullptr) {
     infoLog(category(), "Creating singleMessageSession");
-    singleMessageSession_ = makeSingleMessageSession();
+    single.account = user;
+    single.session = makeSingleMessageSession(user);
   }
   if (singleMessageSessionReaper_ == nullptr) {
     singleMessageSessionReaper_ =
@@ -170,54 +202,67 @@ TWReportingService::Session TWReportingService::singleMessageSession() {
           if (const auto service = self.lock()) service->_reapSingleMessageSession();
         });
   }
-  singleMessageSessionLastRetrieved_ = now();
-  return singleMessageSession_;
+  single.lastRetrieved = now();
+  return single.session;
 }
 
-TWReportingService::Session TWReportingService::currentSingleMessageSession() const {
+std::vector<TWReportingService::Session> TWReportingService::currentSingleMessageSessions() const {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   const MutexLock lock(singleMessageMutex_);
-  return singleMessageSession_;
+  std::vector<Session> sessions;
+  for (const auto& [user, single] : singleMessages_) sessions.push_back(single.session);
+  return sessions;
 }
 
-TWReportingService::Session TWReportingService::makeSingleMessageSession() {
+TWReportingService::Session TWReportingService::makeSingleMessageSession(
+    const std::shared_ptr<Account>& user) {
   const std::int32_t ownIdentifier =
       TWReportingContext::current().platform().processes.ownProcessIdentifier();
-  Session session = TWReportingSession::initWithID(kSingleMessageReporterID, {ownIdentifier});
+  Session session = TWReportingSession::initWithID(kSingleMessageReporterID, {ownIdentifier},
+                                                   std::make_shared<KeptBytesBudget>(user));
   session->setSingleMessageSession(true);
   session->setServiceType(kServiceStandalone);
   const ValueMap configuration{{TWReportingApplicationName, "Unknown"}};
-  (void)session->updateConfigurationWithContentsOfConfiguration(&configuration);  // fits: its budget is empty
+  // Whether it fits changes nothing for the client's message.
+  (void)session->updateConfigurationWithContentsOfConfiguration(&configuration);
   session->start();
   return session;
 }
 
 void TWReportingService::_reapSingleMessageSession() {
   const MutexLock lock(singleMessageMutex_);
-  if (singleMessageSession_ == nullptr || !singleMessageSessionLastRetrieved_) return;
-  const double elapsed = now() - *singleMessageSessionLastRetrieved_;
-  if (!(kSingleMessageSessionTimeoutSeconds < elapsed)) {
-    debugLog(category(), "Not stopping singleMessageSession. elapsed=%f timeout=%f", elapsed,
-             kSingleMessageSessionTimeoutSeconds);
-    return;
+  for (auto at = singleMessages_.begin(); at != singleMessages_.end();) {
+    const double elapsed = now() - at->second.lastRetrieved;
+    if (!(kSingleMessageSessionTimeoutSeconds < elapsed)) {
+      debugLog(category(), "Not stopping singleMessageSession. elapsed=%f timeout=%f", elapsed,
+               kSingleMessageSessionTimeoutSeconds);
+      ++at;
+      continue;
+    }
+    infoLog(category(), "Stopping singleMessageSession after timeout=%f",
+            kSingleMessageSessionTimeoutSeconds);
+    // Queued under the lock, so that a thread that finds no session knows that its stop is already queued.
+    TWReportingContext::current().turns().add(at->second.account, [session = std::move(at->second.session)] {
+      session->stop();
+      return TurnQueue::Progress::kDone;
+    });
+    at = singleMessages_.erase(at);
   }
-  infoLog(category(), "Stopping singleMessageSession after timeout=%f", kSingleMessageSessionTimeoutSeconds);
-  singleMessageSessionReaper_.reset();
-  // Queued under the lock, so that a thread that finds no session knows that its stop is already on the
-  // queue.
-  TWReportingUtilityGetReportingServerQueue().async(
-      [session = std::exchange(singleMessageSession_, nullptr)] { session->stop(); });
+  if (singleMessages_.empty()) singleMessageSessionReaper_.reset();
 }
 
-void TWReportingService::stopSingleMessageSession() {
+void TWReportingService::stopSingleMessageSessions() {
   assert(TWReportingUtilityIsOnReportingServerQueue());
-  Session session;
+  std::map<std::uint32_t, SingleMessage> taken;
   {
     const MutexLock lock(singleMessageMutex_);
     singleMessageSessionReaper_.reset();
-    session = std::exchange(singleMessageSession_, nullptr);
+    taken = std::exchange(singleMessages_, {});
   }
-  if (session != nullptr) session->stop();
+  for (const auto& [user, single] : taken) {
+    const WorkingFor scope(single.account);
+    single.session->stop();
+  }
 }
 
 void TWReportingService::removeClient(const TWReportingClientServerInstance& client) {
@@ -229,7 +274,8 @@ void TWReportingService::logReportingSessions() {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   const LogCategory* log = category();
   if (!log->isEnabled(LogLevel::kDebug)) return;  // the list is needed for the log only
-  const std::vector<Session> active = getAllActiveReportingSessions();
+  const std::vector<Session> active =
+      getAllActiveReportingSessions(*TWReportingContext::current().platform().accounts.own());
   debugLog(log, "%ld active reporting session(s) %@", active.size(), active);
 }
 

@@ -2,7 +2,9 @@
 #pragma once
 
 #include <atomic>
+#include <cstdint>
 #include <functional>
+#include <map>
 #include <memory>
 #include <optional>
 #include <vector>
@@ -10,15 +12,15 @@
 #include "platform/Messaging.h"
 #include "platform/TimerService.h"
 #include "service/MessageTap.h"
-#include "service/SessionIndex.h"
+#include "service/SessionDirectory.h"
 #include "service/TWReportingServiceDelegateProtocol.h"
 #include "values/Mutex.h"
 
 namespace tonewerk {
 
 // Accepts clients, keeps their list and finds sessions across clients. The daemon has one service. It owns
-// the single-message session, which takes messages without reporter identifiers while no session is
-// started.
+// the single-message sessions: that of a user takes the user's messages without reporter identifiers while
+// none of the user's sessions is started.
 //
 // Three kinds of thread call it: the messaging threads (acceptance and the connections' handlers), the work
 // queue (everything about clients and sessions) and the timers' thread (the reaper).
@@ -39,11 +41,11 @@ class TWReportingService final : public MessagingListenerDelegate,
   // Accepts every connection, whichever process the peer is.
   [[nodiscard]] bool listenerShouldAcceptNewConnection(MessagingConnection& connection) override;
 
-  Session findReportingSessionForID(ReporterID reporterID) override;
-  std::vector<Session> findReportingSessionsForIDs(
-      const std::optional<std::vector<ReporterID>>& reporterIDs) override;
-  std::vector<Session> getAllActiveReportingSessions() override;
-  Session currentSingleMessageSession() const override;
+  Session findReportingSessionForID(ReporterID reporterID, const Account& requester) override;
+  std::vector<Session> findReportingSessionsForIDs(const std::optional<std::vector<ReporterID>>& reporterIDs,
+                                                   const std::shared_ptr<Account>& requester) override;
+  std::vector<Session> getAllActiveReportingSessions(const Account& requester) override;
+  std::vector<Session> currentSingleMessageSessions() const override;
   const std::vector<Client>& getAllClients() const override;
   bool isReportingEnabled() const override { return reportingEnabled_; }
   void removeClient(const TWReportingClientServerInstance& client) override;
@@ -51,13 +53,12 @@ class TWReportingService final : public MessagingListenerDelegate,
   MessageTap& messageTap() override;
   void endProcess() override { endProcess_(); }
 
-  // The reaper calls this twice a second on the timers' thread. When the single-message session was last
-  // used more than kSingleMessageSessionTimeoutSeconds ago, it is taken out, and its stop is queued on the
-  // work queue.
+  // The reaper calls this twice a second on the timers' thread. A single-message session that was last used
+  // more than kSingleMessageSessionTimeoutSeconds ago is taken out, and its stop is queued on the work queue.
   void _reapSingleMessageSession();
 
-  // Stops the single-message session, if there is one. Called at the daemon's end, on the work queue.
-  void stopSingleMessageSession();
+  // Stops the single-message sessions. Called at the daemon's end, on the work queue.
+  void stopSingleMessageSessions();
 
   void setReportingEnabled(bool enabled) { reportingEnabled_ = enabled; }
 
@@ -65,23 +66,27 @@ class TWReportingService final : public MessagingListenerDelegate,
   void registerClient(const Client& client);
   void reportClientUptime(std::int32_t processIdentifier,
                           const std::weak_ptr<TWReportingClientServerInstance>& client);
-  Session singleMessageSession();
-  static Session makeSingleMessageSession();
+  std::vector<Session> findSessions(const std::vector<ReporterID>& reporterIDs, const Account& requester);
+  Session singleMessageSession(const std::shared_ptr<Account>& user);
+  static Session makeSingleMessageSession(const std::shared_ptr<Account>& user);
 
   const std::function<void()> endProcess_;
   std::atomic<bool> reportingEnabled_ = true;
   std::vector<Client> clients_;                      // in order of connection; used on the work queue
   SessionIndex::ClientNumber lastClientNumber_ = 0;  // used on the work queue
-  // The sessions of all clients. Shared with clients that may outlive the service.
-  const std::shared_ptr<SessionIndex> sessionIndex_ = std::make_shared<SessionIndex>();
-  MessageTap messageTap_;  // used on the work queue
+  SessionDirectory directory_;                       // of all clients' sessions; used on the work queue
+  MessageTap messageTap_;                            // used on the work queue
 
   Mutex mutex_;  // held while a client is made and while a session is searched for; guards no member
 
+  struct SingleMessage {
+    std::shared_ptr<Account> account;
+    Session session;
+    double lastRetrieved = 0;  // in seconds since 1970
+  };
   mutable Mutex singleMessageMutex_;
-  Session singleMessageSession_ GUARDED_BY(singleMessageMutex_);
-  // Seconds since 1970.
-  std::optional<double> singleMessageSessionLastRetrieved_ GUARDED_BY(singleMessageMutex_);
+  // By user. A user has none while its messages go to other sessions.
+  std::map<std::uint32_t, SingleMessage> singleMessages_ GUARDED_BY(singleMessageMutex_);
   std::unique_ptr<Timer> singleMessageSessionReaper_ GUARDED_BY(singleMessageMutex_);
 };
 

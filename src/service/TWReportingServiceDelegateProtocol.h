@@ -9,11 +9,14 @@
 
 namespace tonewerk {
 
+class Account;
 class MessageTap;
 class TWReportingClientServerInstance;
 class TWReportingSession;
 
 // What client objects need of the service. Called on the work queue, unless a member says otherwise.
+//
+// A `requester` reaches the sessions of its user's clients; one that is trusted reaches those of all clients.
 class TWReportingServiceDelegateProtocol {
  public:
   using Session = std::shared_ptr<TWReportingSession>;
@@ -23,18 +26,19 @@ class TWReportingServiceDelegateProtocol {
 
   // Returns the session with that identifier; if several clients have one, that of the client that connected
   // first. Null for 0, for an unknown identifier and while reporting is disabled.
-  virtual Session findReportingSessionForID(ReporterID reporterID) = 0;
+  virtual Session findReportingSessionForID(ReporterID reporterID, const Account& requester) = 0;
 
   // Returns the sessions that a message goes to: the named ones that exist. Without names these are all
-  // started sessions, or the single-message session when none is started.
+  // started sessions, or the requester's single-message session when none is started.
   virtual std::vector<Session> findReportingSessionsForIDs(
-      const std::optional<std::vector<ReporterID>>& reporterIDs) = 0;
+      const std::optional<std::vector<ReporterID>>& reporterIDs,
+      const std::shared_ptr<Account>& requester) = 0;
 
-  // The started sessions of all clients.
-  virtual std::vector<Session> getAllActiveReportingSessions() = 0;
+  // The started sessions that the requester reaches.
+  virtual std::vector<Session> getAllActiveReportingSessions(const Account& requester) = 0;
 
-  // The single-message session while there is one, else null.
-  virtual Session currentSingleMessageSession() const = 0;
+  // Each user has a single-message session while it is needed.
+  virtual std::vector<Session> currentSingleMessageSessions() const = 0;
 
   // In order of connection.
   virtual const std::vector<Client>& getAllClients() const = 0;

@@ -10,7 +10,8 @@
 #include <utility>
 #include <vector>
 
-#include "platform/SerialQueue.h"
+#include "platform/Platform.h"
+#include "platform/accounts/WorkingFor.h"
 #include "protocol/Requests.h"
 #include "service/WatchRequests.h"
 #include "session/TWReportingContext.h"
@@ -117,6 +118,9 @@ constexpr Handler kHandlers[] = {
 
 constexpr std::size_t kNoHandler = std::size(kHandlers);
 
+// The log lines that the requests of one connection may cause at once, and then each second.
+constexpr LineAllowance::Rate kConnectionLines{.burst = 2000, .perSecond = 20};
+
 // Returns the index of a request's handler in kHandlers; kNoHandler when it has none.
 constexpr std::size_t handlerOf(const Method& method) {
   for (std::size_t at = 0; at < std::size(kHandlers); ++at) {
@@ -134,7 +138,7 @@ constexpr auto kHandlerOf = [] {
 static_assert(std::find(kHandlerOf.begin(), kHandlerOf.end(), kNoHandler) == kHandlerOf.end(),
               "a request has no handler");
 static_assert(std::none_of(requests::kAll.begin(), requests::kAll.end(),
-                           [](const Method& method) { return method.carriesMessage && method.forOwner; }),
+                           [](const Method& method) { return method.carriesMessage && method.forTrusted; }),
               "the way of messages does not ask who the caller is");
 static_assert(std::size(kHandlers) == requests::kAll.size(), "a handler has no request");
 
@@ -142,8 +146,15 @@ static_assert(std::size(kHandlers) == requests::kAll.size(), "a handler has no r
 
 TWReportingServiceExport::TWReportingServiceExport(std::shared_ptr<TWReportingServiceProtocol> object,
                                                    std::unique_ptr<WatchRequests> watch,
+                                                   std::shared_ptr<Account> account,
                                                    std::shared_ptr<ShapeTable> shapes)
-    : object_(std::move(object)), watch_(std::move(watch)), shapes_(std::move(shapes)) {}
+    : object_(std::move(object)),
+      watch_(std::move(watch)),
+      account_(std::move(account)),
+      lines_(std::make_shared<LineAllowance>(TWReportingContext::current().platform().clock, kConnectionLines,
+                                             &account_->lines())),
+      shapes_(std::move(shapes)),
+      turns_(TWReportingContext::current().turns()) {}
 
 TWReportingServiceExport::~TWReportingServiceExport() = default;
 
@@ -163,15 +174,21 @@ std::optional<ReplyError> TWReportingServiceExport::takeRole(const Method& metho
 }
 
 void TWReportingServiceExport::handleReceived(std::unique_ptr<ReceivedRequests> requests) {
-  SerialQueue& queue = TWReportingUtilityGetReportingServerQueue();
   bool areAllDelivered = false;
-  if (queue.runAtOnce([&] { areAllDelivered = requests->deliverQuick(); }) && areAllDelivered) return;
-  queue.async([received = std::move(requests)] { received->deliver(); });
+  const auto deliverQuick = [&] {
+    const WorkingFor scope(account_, lines_.get());
+    areAllDelivered = requests->deliverQuick();
+  };
+  if (turns_.runAtOnce(account_, deliverQuick) && areAllDelivered) return;
+  turns_.add(account_, [received = std::move(requests), account = account_, lines = lines_] {
+    const WorkingFor scope(account, lines.get());
+    return received->deliver() ? TurnQueue::Progress::kDone : TurnQueue::Progress::kMore;
+  });
 }
 
 bool TWReportingServiceExport::isQuick(std::size_t method, const IncomingMessage* message) const {
   const Method& called = requests::kAll[method];
-  if (message == nullptr) return !called.carriesMessage && !called.changesState && !called.forOwner;
+  if (message == nullptr) return !called.carriesMessage && !called.changesState && !called.forTrusted;
   if (!message->reporterIDs || message->reporterIDs->size() != 1) return false;  // there may be many sessions
   return !TWReportingContext::current().workerRegistry().slowTypes().contains(message->type);
 }

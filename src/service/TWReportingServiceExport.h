@@ -7,6 +7,7 @@
 #include <optional>
 
 #include "platform/RequestHandler.h"
+#include "platform/accounts/TurnQueue.h"
 #include "service/TWReportingServiceProtocol.h"
 
 namespace tonewerk {
@@ -20,9 +21,10 @@ class WatchRequests;
 // onlooker's requests that change something are refused, and so is a client's request to be an onlooker.
 class TWReportingServiceExport final : public RequestHandler {
  public:
-  // Maps among the arguments get their shapes from `shapes`; they are trees without it.
+  // The connection's work is done in turns of `account`, that of its user. Maps among the arguments get their
+  // shapes from `shapes`; they are trees without it.
   TWReportingServiceExport(std::shared_ptr<TWReportingServiceProtocol> object,
-                           std::unique_ptr<WatchRequests> watch,
+                           std::unique_ptr<WatchRequests> watch, std::shared_ptr<Account> account,
                            std::shared_ptr<ShapeTable> shapes = nullptr);
   ~TWReportingServiceExport() override;
 
@@ -32,12 +34,13 @@ class TWReportingServiceExport final : public RequestHandler {
   void handleMessage(std::size_t method, IncomingMessage& message, Reply reply, InFlightToken token) override;
   // Delivers the requests as the work queue's own work, so that no value is made on one thread and freed on
   // another: quick ones at once on this thread when the queue has nothing to do, because waking its thread
-  // costs more than a message; all others on its thread.
+  // costs more than a message; all others on its thread, in the user's turns.
   void handleReceived(std::unique_ptr<ReceivedRequests> requests) override;
   // True for requests that only read, and for messages to one session whose type makes no worker wait.
   bool isQuick(std::size_t method, const IncomingMessage* message) const override;
   void expectMessage(ReporterID session) override { object_->expectMessage(session); }
   ShapeTable* shapes() override { return shapes_.get(); }
+  bool isTurnOver() const override { return turns_.isTurnOver(); }
   // True for the request to end the process, which does not wait for the work queue. But when the connection
   // has asked to be an onlooker and may be one by now, the answer to that comes first.
   bool isUrgent(std::size_t method) override;
@@ -52,7 +55,10 @@ class TWReportingServiceExport final : public RequestHandler {
   bool hasAskedToObserve_ = false;  // used on the messaging thread
   const std::shared_ptr<TWReportingServiceProtocol> object_;
   const std::unique_ptr<WatchRequests> watch_;
+  const std::shared_ptr<Account> account_;
+  const std::shared_ptr<LineAllowance> lines_;  // what the connection's requests may log
   const std::shared_ptr<ShapeTable> shapes_;
+  TurnQueue& turns_;
 };
 
 }  // namespace tonewerk

@@ -8,10 +8,12 @@
 
 #include "platform/Log.h"
 #include "platform/SerialQueue.h"
+#include "platform/accounts/TurnQueue.h"
 #include "service/MessageTap.h"
 #include "service/SessionListing.h"
 #include "service/TWReportingServiceDelegateProtocol.h"
 #include "service/TapSubscriber.h"
+#include "session/TWReportingContext.h"
 #include "session/TWReportingUtility.h"
 #include "values/Value.h"
 
@@ -37,23 +39,25 @@ ReplyError tooManyEntries(std::size_t count) {
 
 }  // namespace
 
-WatchRequests::WatchRequests(std::int32_t processIdentifier,
+WatchRequests::WatchRequests(std::int32_t processIdentifier, std::shared_ptr<Account> account,
                              std::weak_ptr<TWReportingServiceDelegateProtocol> service)
     : processIdentifier_(processIdentifier),
+      account_(std::move(account)),
       service_(std::move(service)),
       subscriber_(std::make_shared<TapSubscriber>()) {}
 
 template <class Body>
 void WatchRequests::onWorkQueue(Body body, Reply reply, InFlightToken token) {
-  SerialQueue& queue = TWReportingUtilityGetReportingServerQueue();
-  if (queue.isCurrent()) {
+  if (TWReportingUtilityGetReportingServerQueue().isCurrent()) {
     if (const auto service = service_.lock()) body(*service, reply, token);
     return;
   }
-  queue.async([service = service_, body = std::move(body), reply = std::move(reply),
-               token = std::move(token)]() mutable {
-    if (const auto living = service.lock()) body(*living, reply, token);
-  });
+  TWReportingContext::current().turns().add(
+      account_, [service = service_, body = std::move(body), reply = std::move(reply),
+                 token = std::move(token)]() mutable {
+        if (const auto living = service.lock()) body(*living, reply, token);
+        return TurnQueue::Progress::kDone;
+      });
 }
 
 void WatchRequests::sessions(const Arguments& arguments, Reply reply, InFlightToken token) {

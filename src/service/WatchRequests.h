@@ -8,6 +8,7 @@
 
 namespace tonewerk {
 
+class Account;
 class TapSubscriber;
 class TWReportingServiceDelegateProtocol;
 
@@ -17,7 +18,8 @@ class TWReportingServiceDelegateProtocol;
 class WatchRequests {
  public:
   // The object holds `service` weakly. A request does nothing when the service is gone.
-  WatchRequests(std::int32_t processIdentifier, std::weak_ptr<TWReportingServiceDelegateProtocol> service);
+  WatchRequests(std::int32_t processIdentifier, std::shared_ptr<Account> account,
+                std::weak_ptr<TWReportingServiceDelegateProtocol> service);
 
   void sessions(const Arguments& arguments, Reply reply, InFlightToken token);
   void openMessages(const Arguments& arguments, Reply reply, InFlightToken token);
@@ -30,6 +32,7 @@ class WatchRequests {
   void onWorkQueue(Body body, Reply reply, InFlightToken token);
 
   const std::int32_t processIdentifier_;
+  const std::shared_ptr<Account> account_;
   const std::weak_ptr<TWReportingServiceDelegateProtocol> service_;
   const std::shared_ptr<TapSubscriber> subscriber_;  // used on the work queue
 };

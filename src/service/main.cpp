@@ -18,6 +18,7 @@
 #include "monitor/TWReportingSystemMonitor.h"
 #include "platform/Log.h"
 #include "platform/Platform.h"
+#include "platform/accounts/TurnQueue.h"
 #include "platform/linux/LinuxPlatform.h"
 #include "platform/linux/dbus/DbusListener.h"
 #include "platform/linux/diagnostics/DiagnosticsStore.h"
@@ -108,8 +109,10 @@ class Daemon {
         diagnostics_(linux.diagnostics()),
         context_(platformOf(linux, directories), allWorkerClasses()),
         service_(TWReportingService::make([this] { endOnKillRequest(); })),
-        listener_(std::move(socket), log, watchdogOf(manager, linux.clock()), ::geteuid(), &linux.memory()),
-        dbusListener_(dbusNames(), requests::all(), dbusAddressFromEnvironment(), log, &linux.memory()) {
+        listener_(std::move(socket), log, linux.accounts(), watchdogOf(manager, linux.clock()),
+                  &linux.memory()),
+        dbusListener_(dbusNames(), requests::all(), dbusAddressFromEnvironment(), log, linux.accounts(),
+                      &linux.memory()) {
     diagnostics_.removeLeftovers();  // this daemon has the socket, so no other one writes there
     // Read once here, so that reading the device facts again later does not change it.
     hasSignposts_ = context_.isInternalBuild() && isTracingBuiltIn();
@@ -150,9 +153,10 @@ class Daemon {
     runtimeWatcher_ = nullptr;
     listener_.shutDown();
     dbusListener_.shutDown();
+    context_.turns().finish();
     SerialQueue& queue = context_.reportingServerQueue();
     queue.async([this] {
-      service_->stopSingleMessageSession();
+      service_->stopSingleMessageSessions();
       TWReportingSystemMonitor::reset();  // while the queue of its handlers exists
     });
     queue.drain();

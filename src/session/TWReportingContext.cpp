@@ -6,6 +6,7 @@
 
 #include "platform/DeviceFacts.h"
 #include "platform/Log.h"
+#include "platform/accounts/TurnQueue.h"
 #include "session/TWReportingUtility.h"
 #include "session/WeakQueueRef.h"
 
@@ -59,9 +60,15 @@ SerialQueue& TWReportingContext::reportingServerQueue() {
     reportingServerQueue_ = platform_.queues.makeSerialQueue("com.orvane.tonewerk.reporting.server",
                                                              QueuePriority::kUserInteractive);
     reportingServerQueueRef_ = std::make_shared<WeakQueueRef>(*reportingServerQueue_);
+    turns_ = std::make_shared<TurnQueue>(*reportingServerQueue_, platform_.clock, platform_.timers);
     livingReportingServerQueue_ = reportingServerQueue_.get();
   });
   return *livingReportingServerQueue_;
+}
+
+TurnQueue& TWReportingContext::turns() {
+  reportingServerQueue();
+  return *turns_;
 }
 
 bool TWReportingContext::isOnReportingServerQueue() const {
@@ -76,6 +83,10 @@ std::shared_ptr<WeakQueueRef> TWReportingContext::reportingServerQueueRef() {
 
 void TWReportingContext::endReportingServerQueue() {
   if (reportingServerQueueRef_ != nullptr) reportingServerQueueRef_->close();
+  if (turns_ != nullptr) {
+    turns_->finish();
+    turns_->close();
+  }
   reportingServerQueue_.reset();  // runs what is still queued, which may ask for the queue
   livingReportingServerQueue_ = nullptr;
 }

@@ -22,6 +22,7 @@
 
 namespace tonewerk {
 
+class TurnQueue;
 class WeakQueueRef;
 
 // Holds what the process has one of: the platform's services, the work queue, the log categories, the worker
@@ -46,6 +47,9 @@ class TWReportingContext {
 
   // The one serial queue that carries every request body, session and worker call. Made on first use.
   SerialQueue& reportingServerQueue();
+
+  // Where requests queue: the users' work, which takes turns on the work queue. Made with the work queue.
+  TurnQueue& turns();
 
   // True where clients, sessions and workers may be used: on the work queue
   // (SerialQueue::ownsThisThread()), and on any thread while there is no work queue. For assertions.
@@ -128,6 +132,7 @@ class TWReportingContext {
   std::unique_ptr<SerialQueue> reportingServerQueue_;
   std::atomic<SerialQueue*> livingReportingServerQueue_ = nullptr;  // until the queue's last work has run
   std::shared_ptr<WeakQueueRef> reportingServerQueueRef_;           // made with the work queue
+  std::shared_ptr<TurnQueue> turns_;                                // made with the work queue
 };
 
 }  // namespace tonewerk

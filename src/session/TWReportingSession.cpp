@@ -105,6 +105,7 @@ TWReportingSession::~TWReportingSession() {
   logUnkeptCount();
   emitTracePoint(TWReportingTracePoint::kSessionReleased);
   infoLog(TWReportingSessionCategory(), "deallocing this session %lli", reporterID_);
+  giveBackMessageBytes();
   budget_->give(keptBytes());
 }
 
@@ -252,7 +253,8 @@ void TWReportingSession::prefetchForMessage() const {
   for (const Consumer& consumer : consumers_) prefetch(consumer.worker);
 }
 
-void TWReportingSession::sendMessage(TWReportingSessionMessage& message, const MessageReply& reply) {
+void TWReportingSession::sendMessage(TWReportingSessionMessage& message, const MessageReply& reply,
+                                     const Sender& sender) {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   ++totalMessageCount_;
   if (!completePacked(message)) {
@@ -268,8 +270,11 @@ void TWReportingSession::sendMessage(TWReportingSessionMessage& message, const M
   debugLog(TWReportingSessionCategory(),
            "TWReportingSessionWorker action=sendMessage reporterID=%lli app=%@ redundant=%@ message=%@",
            reporterID_, applicationName_, yesOrNo(message.isRedundant), message);
-  addPreviousValues(message.message);
-  const TWReportingSessionMessage* stored = message.isRedundant ? nullptr : store(message);
+  const bool isForeign = isOfAnotherUser(sender);
+  // Half of the budget stays for what the session's own client sends.
+  if (!isForeign || budget_->used() < budget_->limit() / 2) addPreviousValues(message.message);
+  const TWReportingSessionMessage* stored =
+      message.isRedundant ? nullptr : store(message, isForeign ? sender : nullptr);
   if (!message.isRedundant && stored == nullptr) ++unkeptMessageCount_;
   // A worker that keeps the payload shares that of the stored message, which takes memory anyway. A copy,
   // because a worker may stop the session.
@@ -344,27 +349,34 @@ std::shared_ptr<TWReportingSessionMessage> TWReportingSession::lifecycleMessage(
   return std::make_shared<TWReportingSessionMessage>(std::move(payload), kCategorySetup, type);
 }
 
-const TWReportingSessionMessage* TWReportingSession::store(const TWReportingSessionMessage& message) {
+const TWReportingSessionMessage* TWReportingSession::store(const TWReportingSessionMessage& message,
+                                                           const Sender& sender) {
   const NewestMessages::Kind kind{message.category, message.type};
   const bool isNewKind = newest_.find(kind) == nullptr;
   const std::size_t bytes = messages_.bytesFor(message) + (isNewKind ? NewestMessages::kKindBytes : 0);
-  if (!budget_->take(bytes)) {
-    logFullBudgetOnce();
+  KeptBytesBudget& payer = sender == nullptr ? *budget_ : *sender;
+  if (!payer.take(bytes)) {
+    logFullBudgetOnce(payer);
     return nullptr;
   }
-  messageBytes_ += bytes;
+  if (sender == nullptr) {
+    messageBytes_ += bytes;
+  } else {
+    if (payments_.empty() || payments_.back().sender != sender) payments_.push_back({sender, 0});
+    payments_.back().bytes += bytes;
+  }
   const TWReportingSessionMessage* stored = &messages_.add(message);
   newest_.set(kind, stored);
   return stored;
 }
 
-void TWReportingSession::logFullBudgetOnce() {
-  if (!budget_->isFirstRefusal()) return;
+void TWReportingSession::logFullBudgetOnce(KeptBytesBudget& budget) {
+  if (!budget.isFirstRefusal()) return;
   errorLog(
       TWReportingSessionCategory(),
       "the client's sessions keep %zu bytes, the most is %zu: further messages are delivered but not kept. "
       "reporterID=%lli",
-      budget_->used(), budget_->limit(), reporterID_);
+      budget.used(), budget.limit(), reporterID_);
 }
 
 void TWReportingSession::logUnkeptMessages() {
@@ -381,8 +393,13 @@ void TWReportingSession::logUnkeptCount() {
 void TWReportingSession::forgetMessages() {
   newest_.clear();
   messages_.clear();
-  budget_->give(messageBytes_);
-  messageBytes_ = 0;
+  giveBackMessageBytes();
+}
+
+void TWReportingSession::giveBackMessageBytes() {
+  budget_->give(std::exchange(messageBytes_, 0));
+  for (const Payment& payment : payments_) payment.sender->give(payment.bytes);
+  payments_.clear();
 }
 
 bool TWReportingSession::completePacked(TWReportingSessionMessage& message) const {
@@ -484,7 +501,7 @@ void TWReportingSession::addPreviousValues(const ValueMap& values) {
     const MutexLock lock(propertiesMutex_);
     if (previousValues_.add(values, *budget_)) return;
   }
-  logFullBudgetOnce();
+  logFullBudgetOnce(*budget_);
 }
 
 void TWReportingSession::takePreviousValuesOf(const TWReportingSession& other) {

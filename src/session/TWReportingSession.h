@@ -81,9 +81,13 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   void logUnkeptMessages();
 
   using MessageReply = std::function<void(const std::optional<ReplyError>& error)>;
+  // The budget of the client that sends a message.
+  using Sender = std::shared_ptr<KeptBytesBudget>;
   // Normalises the message, decides whether it is redundant, stores a copy and delivers it, then replies
-  // without an error.
-  void sendMessage(TWReportingSessionMessage& message, const MessageReply& reply = nullptr);
+  // without an error. When the sender is a client of another user, the copy is taken from the sender's
+  // budget, so that it takes no room from the session's own messages.
+  void sendMessage(TWReportingSessionMessage& message, const MessageReply& reply = nullptr,
+                   const Sender& sender = nullptr);
   void sendMessage(const std::shared_ptr<TWReportingSessionMessage>& message,
                    const MessageReply& reply = nullptr) {
     sendMessage(*message, reply);
@@ -188,9 +192,16 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   void deliver(const TWReportingSessionMessage& message);
   // The bytes that the session has taken from the budget.
   std::size_t keptBytes() const;
-  // Returns the stored message; null when the budget has no room for it.
-  const TWReportingSessionMessage* store(const TWReportingSessionMessage& message);
-  void logFullBudgetOnce();
+  // Returns the stored message; null when the budget has no room for it. `sender` is null for messages that
+  // the session's own budget pays for.
+  const TWReportingSessionMessage* store(const TWReportingSessionMessage& message,
+                                         const Sender& sender = nullptr);
+  bool isOfAnotherUser(const Sender& sender) const {
+    return sender != nullptr && sender->account() != budget_->account();
+  }
+  // Gives the bytes of the stored messages back to those who paid for them.
+  void giveBackMessageBytes();
+  void logFullBudgetOnce(KeptBytesBudget& budget);
   void logUnkeptCount();
   void forgetMessages();
 
@@ -208,7 +219,13 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
 
   KeptMessages messages_;
   NewestMessages newest_;
-  std::size_t messageBytes_ = 0;          // taken from the budget for messages_
+  std::size_t messageBytes_ = 0;  // taken from the budget for messages_
+  // What clients of other users have paid for messages_. Such clients are rare.
+  struct Payment {
+    Sender sender;
+    std::size_t bytes = 0;
+  };
+  std::vector<Payment> payments_;
   std::uint64_t unkeptMessageCount_ = 0;  // delivered but not stored for lack of room, and not logged yet
   std::vector<Consumer> consumers_;       // in the order of consumingMessageWorkers(); workers_ owns them
   SharedString applicationName_;          // the one of configuration_

@@ -20,6 +20,7 @@
 #include "platform/linux/protobuf/Hex.h"
 #include "platform/linux/socket/UnixSocketListener.h"
 #include "support/TemporaryDirectory.h"
+#include "support/TestAccounts.h"
 #include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
@@ -33,7 +34,7 @@ class ReportingClientTest : public testing::Test {
  protected:
   ReportingClientTest() {
     std::string problem;
-    listener = std::make_unique<UnixSocketListener>(ServerSocket::open(path, problem), category);
+    listener = std::make_unique<UnixSocketListener>(ServerSocket::open(path, problem), category, accounts);
     listener->setDelegate(delegate);
     listener->resume();
     EXPECT_FALSE(client.connect({path}));
@@ -47,6 +48,7 @@ class ReportingClientTest : public testing::Test {
   const std::string path = directory.path("reporting.sock");
   MemoryLog log;
   LogCategory category{log, "com.example", "twrs"};
+  TestAccounts accounts;
   MessagingRecord record;
   RigDelegate delegate{record};
   std::unique_ptr<UnixSocketListener> listener;

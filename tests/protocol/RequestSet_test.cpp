@@ -104,25 +104,16 @@ TEST(RequestSetTest, FindsAMethodByItsWholeName) {
   EXPECT_EQ(interface.find(""), std::nullopt);
 }
 
-TEST(RequestSetTest, OwnerMethodsAreForTheDaemonsUserAndRoot) {
-  constexpr std::uint32_t kOwner = 500;
+TEST(RequestSetTest, SomeMethodsAreForTrustedUsers) {
   const Method method{"watch", {}, {}, 0, true};
-  EXPECT_EQ(problemWithCaller(method, kOwner, kOwner), std::nullopt);
-  EXPECT_EQ(problemWithCaller(method, 0, kOwner), std::nullopt);
+  EXPECT_EQ(problemWithCaller(method, true), std::nullopt);
   const ReplyError refusal{std::string(kMessagingErrorDomain), kNotPermitted,
-                           "not permitted: watch is for the user that the daemon runs as, and root"};
-  EXPECT_EQ(problemWithCaller(method, 501, kOwner), refusal);
-  EXPECT_EQ(problemWithCaller(method, 501, 0), refusal);
-}
-
-TEST(RequestSetTest, APeerWithoutAUserIsNeverTheOwner) {
-  EXPECT_NE(problemWithCaller(Method{"watch", {}, {}, 0, true}, kNoUser, 500), std::nullopt);
-  EXPECT_NE(problemWithCaller(Method{"watch", {}, {}, 0, true}, kNoUser, kNoUser), std::nullopt);
+                           "not permitted: watch is for trusted users"};
+  EXPECT_EQ(problemWithCaller(method, false), refusal);
 }
 
 TEST(RequestSetTest, OtherMethodsAreForEveryUser) {
-  EXPECT_EQ(problemWithCaller(Method{"test", {}}, 501, 500), std::nullopt);
-  EXPECT_EQ(problemWithCaller(Method{"test", {}}, kNoUser, 500), std::nullopt);
+  EXPECT_EQ(problemWithCaller(Method{"test", {}}, false), std::nullopt);
 }
 
 }  // namespace

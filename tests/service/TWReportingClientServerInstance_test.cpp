@@ -576,7 +576,7 @@ TEST_F(RequestTest, RequestsReadBeforeTheConnectionEndedStillRun) {
 
 TEST_F(RequestTest, ARequestAfterTheServicesEndDoesNothing) {
   const auto orphan =
-      std::make_shared<TWReportingClientServerInstance>(12, std::weak_ptr<TWReportingService>());
+      std::make_shared<TWReportingClientServerInstance>(12, owner(), std::weak_ptr<TWReportingService>());
   orphan->createReportingSession(77, {});
   orphan->sendMessage({{"a", 1}}, 4, 1, std::nullopt, {});
   orphan->handleConnectionError();

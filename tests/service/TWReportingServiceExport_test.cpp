@@ -20,8 +20,8 @@ std::size_t indexOf(const Method& method) { return *requests::all().find(method.
 class TWReportingServiceExportTest : public ServiceTest {
  protected:
   const std::shared_ptr<TWReportingServiceExport> object = std::make_shared<TWReportingServiceExport>(
-      std::make_shared<TWReportingClientServerInstance>(11, service),
-      std::make_unique<WatchRequests>(11, service));
+      std::make_shared<TWReportingClientServerInstance>(11, owner(), service),
+      std::make_unique<WatchRequests>(11, owner(), service), owner());
 };
 
 TEST_F(TWReportingServiceExportTest, OnlyTheRequestToEndTheProcessIsUrgent) {
@@ -44,13 +44,13 @@ TEST_F(TWReportingServiceExportTest, AClientsRequestToEndTheProcessIsUrgentAlsoA
   EXPECT_TRUE(object->isUrgent(indexOf(requests::kKillService)));
 }
 
-TEST_F(TWReportingServiceExportTest, HasTheWorkQueueDeliverWhatWasReceived) {
+TEST_F(TWReportingServiceExportTest, HasTheWorkQueueDeliverWhatWasReceivedInAsManyTurnsAsItTakes) {
   class Received final : public ReceivedRequests {
    public:
     explicit Received(int& deliveries) : deliveries_(deliveries) {}
-    void deliver() override {
+    bool deliver() override {
       EXPECT_TRUE(TWReportingUtilityGetReportingServerQueue().isCurrent());
-      ++deliveries_;
+      return ++deliveries_ == 2;
     }
 
    private:
@@ -60,7 +60,7 @@ TEST_F(TWReportingServiceExportTest, HasTheWorkQueueDeliverWhatWasReceived) {
   object->handleReceived(std::make_unique<Received>(deliveries));
   EXPECT_EQ(deliveries, 0);
   run();
-  EXPECT_EQ(deliveries, 1);
+  EXPECT_EQ(deliveries, 2);
 }
 
 // Of which some can be delivered at once.
@@ -73,7 +73,10 @@ class QuickRequests final : public ReceivedRequests {
   QuickRequests(Deliveries& deliveries, bool areAllQuick)
       : deliveries_(deliveries), areAllQuick_(areAllQuick) {}
 
-  void deliver() override { ++deliveries_.rest; }
+  bool deliver() override {
+    ++deliveries_.rest;
+    return true;
+  }
   bool deliverQuick() override {
     EXPECT_TRUE(TWReportingUtilityGetReportingServerQueue().isCurrent());
     ++deliveries_.quick;
@@ -142,9 +145,10 @@ TEST_F(TWReportingServiceExportTest, RequestsThatTheWorkQueueDeliversRunAtOnceAn
   class Received final : public ReceivedRequests {
    public:
     explicit Received(RequestHandler& handler) : handler_(handler) {}
-    void deliver() override {
+    bool deliver() override {
       handler_.handleRequest(indexOf(requests::kObserve), {}, {}, {});
       handler_.handleRequest(indexOf(requests::kKillService), {}, {}, {});
+      return true;
     }
 
    private:

@@ -27,7 +27,7 @@ class TWReportingServiceTest : public ServiceTest {
  protected:
   std::vector<ReporterID> identifiersFoundFor(const std::optional<std::vector<ReporterID>>& identifiers) {
     std::vector<ReporterID> found;
-    for (const auto& session : service->findReportingSessionsForIDs(identifiers))
+    for (const auto& session : service->findReportingSessionsForIDs(identifiers, owner()))
       found.push_back(session->reporterID());
     return found;
   }
@@ -198,7 +198,7 @@ TEST_F(TWReportingServiceTest, FindsASessionOfAnyClient) {
   const auto first = connect(11);
   const auto second = connect(12);
   create(*second, 78);
-  EXPECT_EQ(service->findReportingSessionForID(78), sessionOf(1, 78));
+  EXPECT_EQ(service->findReportingSessionForID(78, *owner()), sessionOf(1, 78));
   EXPECT_THAT(test.log.textsOf("twrs", LogLevel::kInfo),
               Contains("found reporting session 78 for client 12"));
 }
@@ -208,11 +208,11 @@ TEST_F(TWReportingServiceTest, AnIdentifierOfTwoClientsFindsTheSessionOfTheFirst
   const auto second = connect(12);
   create(*second, 77);
   create(*first, 77);
-  EXPECT_EQ(service->findReportingSessionForID(77), sessionOf(0, 77));
+  EXPECT_EQ(service->findReportingSessionForID(77, *owner()), sessionOf(0, 77));
 }
 
 TEST_F(TWReportingServiceTest, AnUnknownIdentifierIsAnError) {
-  EXPECT_EQ(service->findReportingSessionForID(5), nullptr);
+  EXPECT_EQ(service->findReportingSessionForID(5, *owner()), nullptr);
   EXPECT_THAT(test.log.textsOf("twrs", LogLevel::kError), ElementsAre("failed to find reporting session 5"));
 }
 
@@ -221,9 +221,9 @@ TEST_F(TWReportingServiceTest, IdentifierZeroAndDisabledReportingFindNothingAndL
   create(*client, 0);
   create(*client, 77);
   test.log.clear();
-  EXPECT_EQ(service->findReportingSessionForID(0), nullptr);
+  EXPECT_EQ(service->findReportingSessionForID(0, *owner()), nullptr);
   service->setReportingEnabled(false);
-  EXPECT_EQ(service->findReportingSessionForID(77), nullptr);
+  EXPECT_EQ(service->findReportingSessionForID(77, *owner()), nullptr);
   EXPECT_THAT(test.log.lines(), IsEmpty());
 }
 
@@ -270,7 +270,7 @@ TEST_F(TWReportingServiceTest, ListsTheActiveSessionsInTheLog) {
 TEST_F(TWReportingServiceTest, WithNoStartedSessionAMessageWithoutIdentifiersMakesTheSingleMessageSession) {
   const auto client = connect(11);
   create(*client, 77);
-  const auto sessions = service->findReportingSessionsForIDs(kNoIDs);
+  const auto sessions = service->findReportingSessionsForIDs(kNoIDs, owner());
   ASSERT_THAT(sessions, SizeIs(1));
   const auto& single = *sessions[0];
   EXPECT_EQ(single.reporterID(), 1);
@@ -280,15 +280,15 @@ TEST_F(TWReportingServiceTest, WithNoStartedSessionAMessageWithoutIdentifiersMak
   EXPECT_EQ(single.configuration(), (ValueMap{{"HostApplicationDisplayID", "Unknown"}}));
   EXPECT_THAT(single.processIdentifiers(), ElementsAre(test.processes.ownProcessIdentifier()));
   EXPECT_THAT(test.log.textsOf("twrs", LogLevel::kInfo), Contains("Creating singleMessageSession"));
-  EXPECT_THAT(service->getAllActiveReportingSessions(), IsEmpty());  // it belongs to no client
+  EXPECT_THAT(service->getAllActiveReportingSessions(*owner()), IsEmpty());  // it belongs to no client
 }
 
 TEST_F(TWReportingServiceTest, AClientsSessionOneIsNotTheSingleMessageSession) {
   const auto client = connect(11);
   create(*client, 1);
-  const auto single = service->findReportingSessionsForIDs(kNoIDs).at(0);
+  const auto single = service->findReportingSessionsForIDs(kNoIDs, owner()).at(0);
   EXPECT_NE(single, sessionOf(0, 1));
-  EXPECT_EQ(service->findReportingSessionForID(1), sessionOf(0, 1));
+  EXPECT_EQ(service->findReportingSessionForID(1, *owner()), sessionOf(0, 1));
 }
 
 TEST_F(TWReportingServiceTest, WithAStartedSessionOfAnyClientNoSingleMessageSessionIsMade) {
@@ -299,9 +299,9 @@ TEST_F(TWReportingServiceTest, WithAStartedSessionOfAnyClientNoSingleMessageSess
 }
 
 TEST_F(TWReportingServiceTest, MessagesKeepTheSingleMessageSessionAliveUntilFiveSecondsAfterTheLast) {
-  const auto first = service->findReportingSessionsForIDs(kNoIDs).at(0);
+  const auto first = service->findReportingSessionsForIDs(kNoIDs, owner()).at(0);
   test.clock.advance(4.0);
-  EXPECT_EQ(service->findReportingSessionsForIDs(kNoIDs).at(0), first);
+  EXPECT_EQ(service->findReportingSessionsForIDs(kNoIDs, owner()).at(0), first);
   test.clock.advance(5.0);
   run();
   EXPECT_TRUE(first->started());
@@ -310,7 +310,7 @@ TEST_F(TWReportingServiceTest, MessagesKeepTheSingleMessageSessionAliveUntilFive
   EXPECT_FALSE(first->started());
   EXPECT_THAT(test.log.textsOf("twrs", LogLevel::kInfo),
               Contains("Stopping singleMessageSession after timeout=5.000000"));
-  EXPECT_NE(service->findReportingSessionsForIDs(kNoIDs).at(0), first);
+  EXPECT_NE(service->findReportingSessionsForIDs(kNoIDs, owner()).at(0), first);
 }
 
 TEST_F(TWReportingServiceTest, TheReaperLogsWhyItWaits) {
@@ -321,7 +321,7 @@ TEST_F(TWReportingServiceTest, TheReaperLogsWhyItWaits) {
 }
 
 TEST_F(TWReportingServiceTest, TheReaperQueuesTheStopOfTheSession) {
-  const auto single = service->findReportingSessionsForIDs(kNoIDs).at(0);
+  const auto single = service->findReportingSessionsForIDs(kNoIDs, owner()).at(0);
   test.clock.advance(6.0);
   EXPECT_TRUE(single->started());  // taken out, not yet stopped
   run();
@@ -335,7 +335,7 @@ TEST_F(TWReportingServiceTest, TheReapersTimerEndsWithTheSessionAndTheNextSessio
   test.log.clear();
   test.clock.advance(10.0);
   EXPECT_THAT(test.log.textsOf("twrs"), IsEmpty());
-  const auto next = service->findReportingSessionsForIDs(kNoIDs).at(0);
+  const auto next = service->findReportingSessionsForIDs(kNoIDs, owner()).at(0);
   test.clock.advance(6.0);
   run();
   EXPECT_FALSE(next->started());
@@ -359,10 +359,10 @@ TEST_F(TWReportingServiceTest, MonitorsTheSystemOnTheWorkQueueAsSoonAsItIsMade) 
 }
 
 TEST_F(TWReportingServiceTest, AtItsEndTheDaemonStopsTheSingleMessageSession) {
-  const auto single = service->findReportingSessionsForIDs(kNoIDs).at(0);
-  service->stopSingleMessageSession();
+  const auto single = service->findReportingSessionsForIDs(kNoIDs, owner()).at(0);
+  service->stopSingleMessageSessions();
   EXPECT_FALSE(single->started());
-  service->stopSingleMessageSession();
+  service->stopSingleMessageSessions();
   EXPECT_THAT(identifiersFoundFor(kNoIDs), ElementsAre(1));
 }
 

@@ -66,7 +66,7 @@ class WatchRequestsTest : public ServiceTest {
 
 // Permissions.
 
-TEST_F(WatchRequestsTest, IsForTheDaemonsOwnUserAndRoot) {
+TEST_F(WatchRequestsTest, IsForTrustedUsers) {
   const std::vector<std::pair<std::string, Arguments>> requests{
       {"watch.sessions", {0}}, {"watch.openMessages", kNoFilter}, {"watch.nextMessages", {}}};
   for (const auto& [method, arguments] : requests) {
@@ -74,8 +74,7 @@ TEST_F(WatchRequestsTest, IsForTheDaemonsOwnUserAndRoot) {
     const auto other = messaging.connect(12, kOther);
     const auto refusal = refusalOf(*other, method, arguments);
     ASSERT_TRUE(refusal);
-    EXPECT_EQ(*refusal, messagingError(4, "not permitted: " + method +
-                                              " is for the user that the daemon runs as, and root"));
+    EXPECT_EQ(*refusal, messagingError(4, "not permitted: " + method + " is for trusted users"));
   }
   const auto root = messaging.connect(13, 0);
   open(*root);

@@ -34,10 +34,13 @@ class ServiceTest : public ReportingTest {
     messaging.resume();
   }
 
-  std::unique_ptr<MemoryClient> connect(std::int32_t processIdentifier) {
-    return messaging.connect(processIdentifier);
+  std::unique_ptr<MemoryClient> connect(std::int32_t processIdentifier,
+                                        std::uint32_t user = MemoryMessaging::kOwner) {
+    return messaging.connect(processIdentifier, user);
   }
   void run() { test.queues.runAll(); }
+  // The account of the daemon's own user, who reaches all sessions.
+  const std::shared_ptr<Account>& owner() { return test.accounts.own(); }
 
   // Sends a request and runs the work queue. Returns the request's answers in order.
   std::vector<MemoryResponse> ask(MemoryClient& client, std::string_view method, Arguments arguments) {
@@ -72,7 +75,7 @@ class ServiceTest : public ReportingTest {
     return found == sessions.end() ? nullptr : found->second;
   }
 
-  MemoryMessaging messaging;
+  MemoryMessaging messaging{&test.accounts};
   int processEnds = 0;
   std::shared_ptr<TWReportingService> service;
 };

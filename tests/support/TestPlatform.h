@@ -44,7 +44,7 @@ namespace tonewerk {
 // Declare it before its users, so that it is destroyed last.
 struct TestPlatform {
   // The user that the daemon runs as.
-  static constexpr std::uint32_t kOwner = 990;
+  static constexpr std::uint32_t kOwner = 500;
 
   TestPlatform() = default;
   TestPlatform(const TestPlatform&) = delete;

@@ -183,8 +183,7 @@ TEST_F(WatchingTest, AnotherUserIsRefused) {
         {"watch.sessions", {0}}, {"watch.openMessages", kNoFilter}, {"watch.nextMessages", {}}};
     for (const auto& [method, arguments] : requests) {
       const Answer answer = stranger.call(method, arguments);
-      EXPECT_EQ(answer.error, messagingError(4, "not permitted: " + method +
-                                                    " is for the user that the daemon runs as, and root"));
+      EXPECT_EQ(answer.error, messagingError(4, "not permitted: " + method + " is for trusted users"));
     }
   });
   EXPECT_EQ(logLinesWith("watches messages"), 0U);

@@ -53,8 +53,8 @@ class Account {
   bool isTrusted() const { return isTrusted_.load(std::memory_order_relaxed); }
   void setTrusted(bool isTrusted) { isTrusted_ = isTrusted; }
 
-  // Takes `amount`. False, and nothing is taken, when that would be more than the user's share. The refusal is
-  // counted.
+  // Takes `amount`. False, and nothing is taken, when that would be more than the user's share; the refusal
+  // is counted.
   [[nodiscard]] bool take(Resource resource, std::uint64_t amount);
   // Takes `amount` that the daemon holds in any case, whatever the share.
   void charge(Resource resource, std::uint64_t amount);

@@ -23,8 +23,8 @@ class LineAllowance {
   // Lines count against `all`, too, unless that is null. `clock` and `all` outlive the object.
   LineAllowance(const Clock& clock, Rate rate, LineAllowance* all = nullptr);
 
-  // Asks to write one line. None when it is to be held back. Else how many lines were held back since the last
-  // one that was written; the caller says so when there were any.
+  // Asks to write one line. None when it is to be held back. Else how many lines were held back since the
+  // last one that was written; the caller says so when there were any.
   [[nodiscard]] std::optional<std::uint64_t> takeLine();
 
   // How many lines were held back in all.

@@ -30,9 +30,9 @@ class TimerService;
 //      no room for reports   v  |  room again, or kLongestWait is over
 //                           waiting
 //
-// The pieces of one user run in the order in which they were added. Between users the time is shared by deficit
-// round robin: each user with work gets kTurn in each round, and a user whose turn took longer pays in the next
-// rounds. A piece that may take long asks isTurnOver() and goes on in the user's next turn.
+// The pieces of one user run in the order in which they were added. Between users the time is shared by
+// deficit round robin: each user with work gets kTurn in each round, and a user whose turn took longer pays
+// in the next rounds. A piece that may take long asks isTurnOver() and goes on in the user's next turn.
 //
 // A user whose reports wait for a sink, as many as the user's share allows, gets no turn until they are
 // written. So the work queue does not wait for the disk on behalf of one user while others have work.
@@ -86,8 +86,8 @@ class TurnQueue : public std::enable_shared_from_this<TurnQueue> {
            (othersWait_.load(std::memory_order_relaxed) && isTimeOver());
   }
 
-  // From now on no user waits for room. Returns when everything that was added has run. Not in the queue's own
-  // work.
+  // From now on no user waits for room. Returns when everything that was added has run. Not in the queue's
+  // own work.
   void finish();
   // Drops what is left, and everything that is added later. Call it before the serial queue ends.
   void close();

@@ -16,11 +16,12 @@ class MemoryClient::Connection final : public MessagingConnection,
                                        public InFlightCounter,
                                        public std::enable_shared_from_this<Connection> {
  public:
-  Connection(std::int32_t processIdentifier, std::uint32_t userIdentifier)
-      : processIdentifier_(processIdentifier), userIdentifier_(userIdentifier) {}
+  Connection(std::int32_t processIdentifier, std::shared_ptr<Account> account)
+      : processIdentifier_(processIdentifier), account_(std::move(account)) {}
 
   std::int32_t processIdentifier() const override { return processIdentifier_; }
-  std::uint32_t userIdentifier() const override { return userIdentifier_; }
+  std::uint32_t userIdentifier() const override { return account_->user(); }
+  const std::shared_ptr<Account>& account() const override { return account_; }
   std::string description() const override {
     return "memory connection of " + std::to_string(processIdentifier_);
   }
@@ -104,7 +105,7 @@ class MemoryClient::Connection final : public MessagingConnection,
     const std::optional<std::size_t> place = requests_->find(request.method);
     if (!place) return reply(messagingError(kUnknownMethod, "unknown method " + request.method));
     const Method& method = requests_->methods[*place];
-    if (const auto problem = problemWithCaller(method, userIdentifier_, MemoryMessaging::kOwner)) {
+    if (const auto problem = problemWithCaller(method, account_->isTrusted())) {
       return reply(problem);
     }
     if (const auto problem = problemWith(method, request.arguments)) {
@@ -120,7 +121,7 @@ class MemoryClient::Connection final : public MessagingConnection,
   }
 
   const std::int32_t processIdentifier_;
-  const std::uint32_t userIdentifier_;
+  const std::shared_ptr<Account> account_;
   const RequestSet* requests_ = nullptr;
   std::shared_ptr<RequestHandler> handler_;
   std::function<void()> interrupted_;
@@ -169,7 +170,8 @@ bool MemoryClient::waitForResponses(std::size_t count, std::chrono::milliseconds
 
 std::size_t MemoryClient::unfinishedRequests() const { return connection_->unfinished(); }
 
-MemoryMessaging::MemoryMessaging() = default;
+MemoryMessaging::MemoryMessaging(Accounts* accounts)
+    : accounts_(accounts != nullptr ? *accounts : own_.emplace(kOwner, clock_)) {}
 
 MemoryMessaging::~MemoryMessaging() { shutDown(); }
 
@@ -183,7 +185,8 @@ void MemoryMessaging::shutDown() {
 std::unique_ptr<MemoryClient> MemoryMessaging::connect(std::int32_t processIdentifier,
                                                        std::uint32_t userIdentifier) {
   if (!isAccepting_ || delegate_ == nullptr) return nullptr;
-  auto connection = std::make_shared<MemoryClient::Connection>(processIdentifier, userIdentifier);
+  auto connection =
+      std::make_shared<MemoryClient::Connection>(processIdentifier, accounts_.of(userIdentifier));
   if (!delegate_->listenerShouldAcceptNewConnection(*connection)) return nullptr;
   std::erase_if(connections_, [](const auto& held) { return held.expired(); });
   connections_.push_back(connection);

@@ -10,6 +10,8 @@
 #include <vector>
 
 #include "platform/Messaging.h"
+#include "platform/accounts/Accounts.h"
+#include "support/manual/ManualClock.h"
 
 namespace tonewerk {
 
@@ -63,7 +65,8 @@ class MemoryClient {
 // A MessagingListener in memory, for a process that is both client and daemon.
 class MemoryMessaging final : public MessagingListener {
  public:
-  MemoryMessaging();
+  // Without `accounts` it has its own. They outlive it.
+  explicit MemoryMessaging(Accounts* accounts = nullptr);
   ~MemoryMessaging() override;
 
   void setDelegate(MessagingListenerDelegate& delegate) override { delegate_ = &delegate; }
@@ -78,6 +81,9 @@ class MemoryMessaging final : public MessagingListener {
                                                       std::uint32_t userIdentifier = kOwner);
 
  private:
+  const ManualClock clock_;
+  std::optional<Accounts> own_;
+  Accounts& accounts_;
   MessagingListenerDelegate* delegate_ = nullptr;
   bool isAccepting_ = false;
   std::vector<std::weak_ptr<MemoryClient::Connection>> connections_;

@@ -15,6 +15,7 @@
 #include "platform/linux/socket/ServerSocket.h"
 #include "platform/linux/socket/UnixSocketListener.h"
 #include "protocol/Requests.h"
+#include "support/TestAccounts.h"
 #include "support/memory/MemoryLog.h"
 #include "values/Mutex.h"
 
@@ -31,7 +32,7 @@ class ScriptedDaemon {
 
   explicit ScriptedDaemon(const std::string& path) {
     std::string problem;
-    listener_.emplace(ServerSocket::open(path, problem), category_);
+    listener_.emplace(ServerSocket::open(path, problem), category_, accounts_);
     listener_->setDelegate(delegate_);
     listener_->resume();
     ender_ = std::thread([this] { waitForTheEnd(); });
@@ -120,6 +121,7 @@ class ScriptedDaemon {
 
   MemoryLog log_;
   LogCategory category_{log_, "com.orvane.tonewerk", "twrs"};
+  TestAccounts accounts_;
   std::map<std::string, Value> results_;
   std::map<std::string, ReplyError> errors_;
   std::optional<std::set<std::int64_t>> sessions_;

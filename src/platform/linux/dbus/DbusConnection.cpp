@@ -7,6 +7,7 @@
 #include <utility>
 
 #include "platform/Log.h"
+#include "platform/accounts/Accounts.h"
 #include "platform/linux/dbus/DbusAnswer.h"
 #include "platform/linux/messaging/AllocatorReclaimer.h"
 
@@ -69,7 +70,7 @@ std::optional<ReplyError> DbusConnection::handleCall(sd_bus_message* call,
 
 // An empty reply when the caller does not want an answer.
 Reply DbusConnection::replyTo(sd_bus_message* call, ResultType result) {
-  if (result == ResultType::kNever || sd_bus_message_get_expect_reply(call) <= 0) return {};
+  if (sd_bus_message_get_expect_reply(call) <= 0) return {};
   const std::uint32_t number = nextCall_++;
   calls_.insert_or_assign(number, Call{BusMessage(sd_bus_message_ref(call)), result});
   return {std::make_shared<DbusReply>(outbox_, number), number};
@@ -80,6 +81,8 @@ void DbusConnection::dispatch(Request request) {
     waiting_.push_back(std::move(request));
     return;
   }
+  const Method& method = context_.interface.methodAt(request.method);
+  if (const auto problem = problemWithCaller(method, account_->isTrusted())) return request.reply(problem);
   // Kept alive here, because the request may end the connection.
   const std::shared_ptr<RequestHandler> object = object_;
   object->handleRequest(request.method, std::move(request.arguments), std::move(request.reply),
@@ -95,11 +98,17 @@ void DbusConnection::identify(DbusPeer peer) {
   if (std::exchange(isIdentified_, true)) return;
   peer_ = peer;
   infoLog(context_.log, "new %@", *this);
+  account_ = context_.accounts.of(peer.userIdentifier);
+  hasPlace_ = account_->take(Resource::kBusConnections, 1);
+  if (!hasPlace_) return reject(messagingError(kOverLimit, "the user has too many clients"));
   isAccepted_ = context_.delegate.listenerShouldAcceptNewConnection(*this) && object_ != nullptr;
   if (isAccepted_) return dispatchWaiting();
+  reject(messagingError(kNotPermitted, "the service does not take this client"));
+}
+
+void DbusConnection::reject(const ReplyError& error) {
   infoLog(context_.log, "%@ was turned away", *this);
   isRejected_ = true;
-  const ReplyError error = messagingError(kNotPermitted, "the service does not take this client");
   for (Request& request : std::exchange(waiting_, {})) request.reply(error);
 }
 
@@ -126,6 +135,7 @@ void DbusConnection::end() {
   calls_.clear();
   waiting_.clear();
   if (isIdentified_) infoLog(context_.log, "%@ has ended", *this);
+  if (std::exchange(hasPlace_, false)) account_->give(Resource::kBusConnections, 1);
   if (interrupted_) interrupted_();
   if (invalidated_) invalidated_();
   interrupted_ = nullptr;

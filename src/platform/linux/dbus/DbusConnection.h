@@ -21,12 +21,15 @@
 
 namespace tonewerk {
 
+class Account;
+class Accounts;
 class AllocatorReclaimer;
 
 // Shared by all clients on one bus.
 struct DbusConnectionContext {
   const DbusInterface& interface;
   MessagingListenerDelegate& delegate;
+  Accounts& accounts;
   std::shared_ptr<IoWaker> waker;
   RpcStrings& texts;
   const LogCategory& log;
@@ -59,6 +62,8 @@ class DbusConnection final : public MessagingConnection {
 
   std::int32_t processIdentifier() const override { return peer_.processIdentifier; }
   std::uint32_t userIdentifier() const override { return peer_.userIdentifier; }
+  // Null until identify().
+  const std::shared_ptr<Account>& account() const override { return account_; }
   std::string description() const override;
   void setRequestHandler(const RequestSet& interface, std::shared_ptr<RequestHandler> object) override;
   void setInterruptionHandler(std::function<void()> handler) override { interrupted_ = std::move(handler); }
@@ -70,6 +75,9 @@ class DbusConnection final : public MessagingConnection {
   // The bus has said who the client is. Later calls do nothing.
   void identify(DbusPeer peer);
   bool isIdentified() const { return isIdentified_; }
+  // The client's user has as many clients as its share allows. Once this one has its answers it is to be
+  // removed, so that it takes no other client's place.
+  bool hasNoPlace() const { return isIdentified_ && !hasPlace_; }
   // Sends one answer. False when no answer is waiting.
   [[nodiscard]] bool sendNext(sd_bus* bus);
   // Ends the connection. Its handlers have returned when this returns. Later calls do nothing.
@@ -91,11 +99,14 @@ class DbusConnection final : public MessagingConnection {
   [[nodiscard]] Reply replyTo(sd_bus_message* call, ResultType result);
   void dispatch(Request request);
   void dispatchWaiting();
+  void reject(const ReplyError& error);
 
   const DbusConnectionContext& context_;
   const std::uint64_t identifier_;
   const std::string name_;
   DbusPeer peer_;
+  std::shared_ptr<Account> account_;
+  bool hasPlace_ = false;  // its account has been charged for the connection
 
   std::shared_ptr<RequestHandler> object_;
   std::function<void()> interrupted_;

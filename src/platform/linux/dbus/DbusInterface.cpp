@@ -86,7 +86,7 @@ DbusInterface::DbusInterface(const RequestSet& methods) : methods_(methods) {
   entries_.reserve(methods.methods.size());
   for (std::size_t index = 0; index < methods.methods.size(); ++index) {
     const Method& method = methods.methods[index];
-    if (!method.forOwner) entries_.push_back(entryOf(method, index));
+    if (!method.isForSocketOnly) entries_.push_back(entryOf(method, index));
   }
   vtable_.push_back(SD_BUS_VTABLE_START(0));
   for (const Entry& entry : entries_) {

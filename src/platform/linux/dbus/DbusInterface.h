@@ -13,7 +13,7 @@ struct sd_bus_vtable;
 namespace tonewerk {
 
 // Describes a request set for D-Bus: its methods in upper camel case, with the signatures of their
-// parameters and results. It leaves out the methods that only the daemon's owner may call.
+// parameters and results. It leaves out the methods that are for the socket only.
 //
 //   kInt64 x   kUInt32 u   kUInt16 q   kMap a{sv}   kInt64ListOrNone ax (an empty one is none)
 //   kBoolean b   kUInt16 q   kMap a{sv}   kInt64List ax   kAny v   kNone and kNever nothing
@@ -35,7 +35,8 @@ class DbusInterface {
 
   // Null when the interface has no such member.
   const Entry* find(std::string_view member) const;
-  const Method& methodOf(const Entry& entry) const { return methods_.methods[entry.index]; }
+  const Method& methodOf(const Entry& entry) const { return methodAt(entry.index); }
+  const Method& methodAt(std::size_t index) const { return methods_.methods[index]; }
 
   // For introspection. Valid as long as this object. The handlers in it refuse every call, so calls need
   // another handler.

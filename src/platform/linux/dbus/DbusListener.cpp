@@ -13,11 +13,12 @@
 namespace tonewerk {
 
 DbusListener::DbusListener(DbusNames names, const RequestSet& methods, std::string address,
-                           const LogCategory& log, AllocatorReclaimer* memory)
+                           const LogCategory& log, Accounts& accounts, AllocatorReclaimer* memory)
     : names_(std::move(names)),
       address_(std::move(address)),
       log_(log),
       interface_(methods),
+      accounts_(accounts),
       memory_(memory) {}
 
 DbusListener::~DbusListener() { shutDown(); }
@@ -39,7 +40,7 @@ void DbusListener::shutDown() {
 
 void DbusListener::run() {
   nameThisThread("tw-dbus");
-  const DbusConnectionContext context{interface_, *delegate_, waker_, texts_, log_, memory_};
+  const DbusConnectionContext context{interface_, *delegate_, accounts_, waker_, texts_, log_, memory_};
   while (!isStopping_) {
     const auto start = std::chrono::steady_clock::now();
     {

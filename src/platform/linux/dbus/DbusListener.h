@@ -29,11 +29,11 @@ class DbusListener final : public MessagingListener {
   static constexpr std::chrono::milliseconds kFirstPause{250};
   static constexpr std::chrono::milliseconds kLongestPause{60'000};
 
-  // `methods`, `log` and `memory` outlive the listener. Delegates export objects of these methods. `address`
-  // is a D-Bus address, empty for the system's bus. `memory` learns how many bytes clients send and when a
-  // client is gone. It may be null.
+  // `methods`, `log`, `accounts` and `memory` outlive the listener. Delegates export objects of these methods.
+  // `address` is a D-Bus address, empty for the system's bus. `memory` learns how many bytes clients send and
+  // when a client is gone. It may be null.
   DbusListener(DbusNames names, const RequestSet& methods, std::string address, const LogCategory& log,
-               AllocatorReclaimer* memory = nullptr);
+               Accounts& accounts, AllocatorReclaimer* memory = nullptr);
   ~DbusListener() override;
 
   void setDelegate(MessagingListenerDelegate& delegate) override { delegate_ = &delegate; }
@@ -50,6 +50,7 @@ class DbusListener final : public MessagingListener {
   const std::string address_;
   const LogCategory& log_;
   const DbusInterface interface_;
+  Accounts& accounts_;
   AllocatorReclaimer* const memory_;
   MessagingListenerDelegate* delegate_ = nullptr;
   const std::shared_ptr<IoWaker> waker_ = std::make_shared<IoWaker>();

@@ -107,6 +107,8 @@ struct DbusService::Handlers {
       return vanished(answer, data, nullptr);  // before the match rule was active
     }
     client.connection.identify(isError(answer) ? DbusPeer() : peerOf(answer));
+    // It may have no answer that is still to be sent.
+    if (client.connection.hasNoPlace()) client.service.answering_.push_back(client.identifier);
     return 0;
   }
 
@@ -203,8 +205,9 @@ void DbusService::takeWakes() {
 void DbusService::sendAnswers() {
   while (!answering_.empty() && !isFull()) {
     const auto found = byIdentifier_.find(answering_.front());
-    if (found == byIdentifier_.end() || !found->second->connection.sendNext(bus_.get()))
-      answering_.pop_front();
+    if (found != byIdentifier_.end() && found->second->connection.sendNext(bus_.get())) continue;
+    answering_.pop_front();
+    if (found != byIdentifier_.end() && found->second->connection.hasNoPlace()) remove(*found->second);
   }
 }
 

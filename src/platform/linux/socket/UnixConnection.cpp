@@ -9,6 +9,7 @@
 #include <utility>
 
 #include "platform/Log.h"
+#include "platform/accounts/Accounts.h"
 #include "platform/linux/messaging/AllocatorReclaimer.h"
 #include "values/Bytes.h"
 
@@ -34,6 +35,7 @@ UnixConnection::UnixConnection(const UnixConnectionContext& context, std::uint64
     processIdentifier_ = peer.pid;
     userIdentifier_ = peer.uid;
   }
+  account_ = context_.accounts.of(userIdentifier_);
 }
 
 UnixConnection::~UnixConnection() {
@@ -48,8 +50,8 @@ std::string UnixConnection::description() const {
 
 void UnixConnection::setRequestHandler(const RequestSet& interface, std::shared_ptr<RequestHandler> object) {
   lastMethod_.reset();
-  requestContext_ = std::make_shared<UnixRequestContext>(UnixRequestContext{
-      interface, std::move(object), context_.decoder, outbox_, window_, userIdentifier_, context_.owner});
+  requestContext_ = std::make_shared<UnixRequestContext>(
+      UnixRequestContext{interface, std::move(object), context_.decoder, outbox_, window_, account_});
 }
 
 void UnixConnection::resume() {

@@ -22,6 +22,8 @@
 
 namespace tonewerk {
 
+class Account;
+class Accounts;
 class AllocatorReclaimer;
 
 // What the connections of one listener's thread share.
@@ -31,7 +33,7 @@ struct UnixConnectionContext {
   SlabPool& slabs;
   std::shared_ptr<RpcFrameDecoder> decoder;
   const LogCategory& log;
-  std::uint32_t owner;  // this user and root may call the methods for the daemon's owner
+  Accounts& accounts;
   // Learns how many bytes a client has sent, and when it is gone. May be null.
   AllocatorReclaimer* memory;
 };
@@ -52,6 +54,7 @@ class UnixConnection final : public MessagingConnection {
 
   std::int32_t processIdentifier() const override { return processIdentifier_; }
   std::uint32_t userIdentifier() const override { return userIdentifier_; }
+  const std::shared_ptr<Account>& account() const override { return account_; }
   std::string description() const override;
   void setRequestHandler(const RequestSet& interface, std::shared_ptr<RequestHandler> object) override;
   void setInterruptionHandler(std::function<void()> handler) override { interrupted_ = std::move(handler); }
@@ -85,6 +88,7 @@ class UnixConnection final : public MessagingConnection {
   FileDescriptor socket_;
   std::int32_t processIdentifier_ = 0;
   std::uint32_t userIdentifier_ = kNoUser;
+  std::shared_ptr<Account> account_;
 
   std::shared_ptr<const UnixRequestContext> requestContext_;  // null after the end
   std::function<void()> interrupted_;

@@ -47,29 +47,33 @@ void UnixRequests::addFirst(const RpcFrameScanner::Frame& frame, std::string byt
   add(frame, first_, method);
 }
 
-void UnixRequests::deliver() { deliver(*context_->decoder, context_->handler->shapes()); }
+bool UnixRequests::deliver() {
+  RequestHandler& handler = *context_->handler;
+  ShapeTable* const shapes = handler.shapes();
+  while (delivered_ < requests_.size()) {
+    lookAhead();
+    (void)deliverNext(*context_->decoder, shapes, Wanted::kAll);
+    if (handler.isTurnOver()) break;
+  }
+  return delivered_ == requests_.size();
+}
 
 void UnixRequests::deliverAtOnce() {
   RpcFrameDecoder decoder;  // the shared one may be in use, and so may the handler's shapes
-  deliver(decoder, nullptr);
+  while (delivered_ < requests_.size()) (void)deliverNext(decoder, nullptr, Wanted::kAll);
 }
 
 bool UnixRequests::deliverQuick() {
   const RequestWindow::Batch finished(*context_->window);
   const ReplyOutbox::Gathering replies(*context_->outbox);
-  ShapeTable* const shapes = context_->handler->shapes();
+  RequestHandler& handler = *context_->handler;
+  ShapeTable* const shapes = handler.shapes();
   while (delivered_ < requests_.size()) {
     lookAhead();
     if (!deliverNext(*context_->decoder, shapes, Wanted::kQuick)) return false;
+    if (handler.isTurnOver()) break;
   }
-  return true;
-}
-
-void UnixRequests::deliver(RpcFrameDecoder& decoder, ShapeTable* shapes) {
-  while (delivered_ < requests_.size()) {
-    lookAhead();
-    if (!deliverNext(decoder, shapes, Wanted::kAll)) return;
-  }
+  return delivered_ == requests_.size();
 }
 
 void UnixRequests::lookAhead() const {
@@ -119,7 +123,7 @@ std::optional<ReplyError> UnixRequests::problemWith(const Request& request, cons
                           "unknown method " + std::string(shortened(frame.method, kMaxMethodNameBytes)));
   }
   const Method& known = context_->methods.methods[*request.method];
-  if (auto problem = problemWithCaller(known, context_->user, context_->owner)) return problem;
+  if (auto problem = problemWithCaller(known, context_->account->isTrusted())) return problem;
   if (frame.refused) return messagingError(kInvalidArguments, problemText(known, *frame.refused));
   std::optional<std::string> problem = tonewerk::problemWith(known, frame.arguments);
   return problem ? std::optional(messagingError(kInvalidArguments, std::move(*problem))) : std::nullopt;

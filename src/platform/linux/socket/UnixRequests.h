@@ -10,6 +10,7 @@
 #include <vector>
 
 #include "platform/RequestHandler.h"
+#include "platform/accounts/Account.h"
 #include "platform/linux/messagepack/RpcFrameDecoder.h"
 #include "platform/linux/messagepack/RpcFrameScanner.h"
 #include "platform/linux/messaging/RequestWindow.h"
@@ -25,8 +26,7 @@ struct UnixRequestContext {
   std::shared_ptr<RpcFrameDecoder> decoder;
   std::shared_ptr<ReplyOutbox> outbox;
   std::shared_ptr<RequestWindow> window;
-  std::uint32_t user;
-  std::uint32_t owner;  // this user and root may call the methods for the daemon's owner
+  std::shared_ptr<Account> account;  // of the peer's user
 };
 
 // The requests of one read from a client's socket: their bytes, and where each one is. The messaging thread
@@ -47,7 +47,7 @@ class UnixRequests final : public ReceivedRequests {
   // Adds the first request, whose bytes came with several reads.
   void addFirst(const RpcFrameScanner::Frame& frame, std::string bytes, std::optional<std::size_t> method);
 
-  void deliver() override;
+  [[nodiscard]] bool deliver() override;
   [[nodiscard]] bool deliverQuick() override;
   // Delivers on the messaging thread, while another thread may deliver other requests of the same listener.
   void deliverAtOnce();
@@ -62,7 +62,6 @@ class UnixRequests final : public ReceivedRequests {
 
   enum class Wanted { kAll, kQuick };
 
-  void deliver(RpcFrameDecoder& decoder, ShapeTable* shapes);
   // Tells the handler of a message that comes soon.
   void lookAhead() const;
   // False when the next request is not one of the wanted ones. It is then not delivered.

@@ -31,11 +31,11 @@ std::size_t descriptorsForClients() {
 }  // namespace
 
 UnixSocketListener::UnixSocketListener(std::unique_ptr<ServerSocket> socket, const LogCategory& log,
-                                       std::unique_ptr<WatchdogFeeder> watchdog, std::uint32_t owner,
+                                       Accounts& accounts, std::unique_ptr<WatchdogFeeder> watchdog,
                                        AllocatorReclaimer* memory)
     : socket_(std::move(socket)),
       log_(log),
-      context_{epoll_, waker_, slabs_, std::make_shared<RpcFrameDecoder>(), log_, owner, memory},
+      context_{epoll_, waker_, slabs_, std::make_shared<RpcFrameDecoder>(), log_, accounts, memory},
       watchdog_(std::move(watchdog)),
       maxConnections_(descriptorsForClients()) {}
 

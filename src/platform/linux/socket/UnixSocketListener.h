@@ -8,7 +8,6 @@
 #include <memory>
 #include <optional>
 #include <thread>
-#include <unistd.h>
 #include <unordered_map>
 
 #include "platform/Messaging.h"
@@ -34,11 +33,11 @@ class UnixSocketListener final : public MessagingListener {
   // connection has ended.
   static constexpr std::chrono::milliseconds kAcceptPause{1000};
 
-  // `log` and `memory` outlive the listener. The messaging thread feeds `watchdog`; without one it wakes up
-  // only for clients. `owner` and root may call the methods that are for the daemon's own user. `memory`
-  // learns how many bytes clients send and when a client is gone. It may be null.
-  UnixSocketListener(std::unique_ptr<ServerSocket> socket, const LogCategory& log,
-                     std::unique_ptr<WatchdogFeeder> watchdog = nullptr, std::uint32_t owner = ::geteuid(),
+  // `log`, `accounts` and `memory` outlive the listener. The messaging thread feeds `watchdog`; without one
+  // it wakes up only for clients. `memory` learns how many bytes clients send and when a client is gone. It
+  // may be null.
+  UnixSocketListener(std::unique_ptr<ServerSocket> socket, const LogCategory& log, Accounts& accounts,
+                     std::unique_ptr<WatchdogFeeder> watchdog = nullptr,
                      AllocatorReclaimer* memory = nullptr);
   ~UnixSocketListener() override;
 

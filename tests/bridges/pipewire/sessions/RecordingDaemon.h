@@ -12,6 +12,7 @@
 #include "platform/Log.h"
 #include "platform/linux/socket/UnixSocketListener.h"
 #include "protocol/Requests.h"
+#include "support/TestAccounts.h"
 #include "support/memory/MemoryLog.h"
 #include "values/Mutex.h"
 
@@ -30,7 +31,7 @@ class RecordingDaemon final : private MessagingListenerDelegate {
     std::string problem;
     std::unique_ptr<ServerSocket> socket = ServerSocket::open(path, problem);
     if (socket == nullptr) return;
-    listener_ = std::make_unique<UnixSocketListener>(std::move(socket), category_);
+    listener_ = std::make_unique<UnixSocketListener>(std::move(socket), category_, accounts_);
     listener_->setDelegate(*this);
     listener_->resume();
   }
@@ -100,6 +101,7 @@ class RecordingDaemon final : private MessagingListenerDelegate {
 
   MemoryLog log_;
   const LogCategory category_{log_, "com.orvane.tonewerk", "twrs"};
+  TestAccounts accounts_;
   mutable Mutex mutex_;
   mutable Condition changed_;
   std::vector<Request> requests_ GUARDED_BY(mutex_);

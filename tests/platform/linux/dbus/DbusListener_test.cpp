@@ -18,6 +18,7 @@
 #include "platform/linux/dbus/PrivateBus.h"
 #include "platform/linux/messagepack/RpcLimits.h"
 #include "platform/linux/messaging/MessagingRig.h"
+#include "support/TestAccounts.h"
 #include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
@@ -39,7 +40,7 @@ class DbusListenerTest : public testing::Test {
   }
 
   void startListener(const std::string& address) {
-    listener = std::make_unique<DbusListener>(kNames, rigInterface(), address, category);
+    listener = std::make_unique<DbusListener>(kNames, rigInterface(), address, category, accounts);
     listener->setDelegate(delegate);
     listener->resume();
   }
@@ -84,6 +85,7 @@ class DbusListenerTest : public testing::Test {
   PrivateBus bus;
   MemoryLog log;
   LogCategory category{log, "com.example", "twrs"};
+  TestAccounts accounts;
   MessagingRecord record;
   RigDelegate delegate{record};
   std::unique_ptr<DbusListener> listener;
@@ -393,7 +395,7 @@ TEST_F(DbusListenerTest, RefusesUnknownMethodsAndObjectsWithStandardErrors) {
   };
   EXPECT_EQ(errorOf(kNames.path, kNames.interface.c_str(), "NoSuchMethod"), SD_BUS_ERROR_UNKNOWN_METHOD);
   EXPECT_EQ(errorOf(kNames.path, kNames.interface.c_str(), "takeInt64"), SD_BUS_ERROR_UNKNOWN_METHOD);
-  EXPECT_EQ(errorOf(kNames.path, kNames.interface.c_str(), "TakeFromOwner"), SD_BUS_ERROR_UNKNOWN_METHOD);
+  EXPECT_EQ(errorOf(kNames.path, kNames.interface.c_str(), "Watch"), SD_BUS_ERROR_UNKNOWN_METHOD);
   EXPECT_EQ(errorOf(kNames.path, "com.example.Other", "TakeInt64"), SD_BUS_ERROR_UNKNOWN_METHOD);
   EXPECT_EQ(errorOf("/com/example", kNames.interface.c_str(), "TakeInt64"), SD_BUS_ERROR_UNKNOWN_OBJECT);
   EXPECT_EQ(errorOf("/", kNames.interface.c_str(), "TakeInt64"), SD_BUS_ERROR_UNKNOWN_OBJECT);
@@ -438,7 +440,7 @@ TEST_F(DbusListenerTest, DescribesItsMethodsForIntrospection) {
                               "   <arg type=\"a{sv}\" name=\"map\" direction=\"in\"/>\n"
                               "   <arg type=\"v\" name=\"answer\" direction=\"out\"/>\n"
                               "  </method>\n"));
-  EXPECT_THAT(text, testing::Not(HasSubstr("TakeFromOwner")));
+  EXPECT_THAT(text, testing::Not(HasSubstr("Watch")));
 }
 
 TEST_F(DbusListenerTest, RefusesRequestsOfAClientPastTheBoundUntilSomeHaveFinished) {
@@ -486,19 +488,35 @@ TEST_F(DbusListenerTest, RefusesRequestsWhoseBytesWouldPassTheBound) {
   EXPECT_TRUE(isServed(caller));
 }
 
-TEST_F(DbusListenerTest, RefusesAClientBeyondTheBoundUntilAnotherHasGone) {
+TEST_F(DbusListenerTest, RefusesAClientBeyondItsUsersShareUntilAnotherHasGone) {
+  constexpr std::size_t kShare = DbusService::kMaxClients / 2;
   std::vector<std::unique_ptr<DbusCaller>> callers;
-  for (std::size_t at = 0; at < DbusService::kMaxClients; ++at) {
+  for (std::size_t at = 0; at < kShare; ++at) {
     callers.push_back(std::make_unique<DbusCaller>(bus.address(), kNames));
     ASSERT_TRUE(isServed(*callers.back()));
   }
   DbusCaller late(bus.address(), kNames);
-  const DbusReceived answer = late.ask("TakeInt64", "x", std::int64_t{1});
-  EXPECT_EQ(answer.error, SD_BUS_ERROR_LIMITS_EXCEEDED);
-  EXPECT_EQ(answer.text, "the service has too many clients");
+  for (int time = 0; time < 2; ++time) {
+    const DbusReceived answer = late.ask("TakeInt64", "x", std::int64_t{1});
+    EXPECT_EQ(answer.error, SD_BUS_ERROR_LIMITS_EXCEEDED);
+    EXPECT_EQ(answer.text, "the user has too many clients");
+  }
+  EXPECT_EQ(accounts->of(::geteuid())->held(Resource::kBusConnections), kShare);
   callers.pop_back();
-  ASSERT_TRUE(record.waitForEvents(DbusService::kMaxClients + 3));
+  ASSERT_TRUE(record.waitForEvents(kShare + 2));
   EXPECT_TRUE(isServed(late));
+}
+
+TEST_F(DbusListenerTest, RefusesAClientBeyondTheBoundOfAllUsers) {
+  // Other users hold all places but one.
+  const auto other = accounts->of(::geteuid() + 1);
+  other->charge(Resource::kBusConnections, DbusService::kMaxClients - 1);
+  DbusCaller first(bus.address(), kNames);
+  EXPECT_TRUE(isServed(first));
+  DbusCaller second(bus.address(), kNames);
+  EXPECT_EQ(second.ask("TakeInt64", "x", std::int64_t{1}).error, SD_BUS_ERROR_LIMITS_EXCEEDED);
+  other->give(Resource::kBusConnections, DbusService::kMaxClients - 1);
+  EXPECT_TRUE(isServed(second));
 }
 
 TEST_F(DbusListenerTest, AnswersFromManyThreadsAtOnce) {

@@ -15,6 +15,7 @@
 #include "platform/linux/messaging/MessagingRig.h"
 #include "platform/linux/socket/UnixSocketListener.h"
 #include "support/TemporaryDirectory.h"
+#include "support/TestAccounts.h"
 #include "support/client/ReportingClient.h"
 #include "support/manual/ManualClock.h"
 #include "support/manual/ManualTimers.h"
@@ -37,7 +38,6 @@ struct PlainTexts {
 class MemorySide {
  public:
   using Texts = PlainTexts;
-  static constexpr bool kKnowsOwnersMethods = true;
 
   explicit MemorySide(MessagingListenerDelegate& delegate) {
     messaging_.setDelegate(delegate);
@@ -70,14 +70,13 @@ class MemorySide {
 class SocketSide {
  public:
   using Texts = PlainTexts;
-  static constexpr bool kKnowsOwnersMethods = true;
 
   explicit SocketSide(MessagingListenerDelegate& delegate, AllocatorReclaimer* memory = nullptr) {
     std::string problem;
     auto socket = ServerSocket::open(path_, problem);
     EXPECT_NE(socket, nullptr) << problem;
     listener_ =
-        std::make_unique<UnixSocketListener>(std::move(socket), category_, nullptr, ::geteuid(), memory);
+        std::make_unique<UnixSocketListener>(std::move(socket), category_, accounts_, nullptr, memory);
     listener_->setDelegate(delegate);
     listener_->resume();
   }
@@ -108,6 +107,7 @@ class SocketSide {
   const std::string path_ = directory_.path("reporting.sock");
   MemoryLog log_;
   LogCategory category_{log_, "com.example", "twrs"};
+  TestAccounts accounts_;
   std::unique_ptr<UnixSocketListener> listener_;
   ReportingClient client_;
   std::vector<Answer> answers_;
@@ -120,10 +120,9 @@ class DbusSide {
     static constexpr const char* kWrongType = "TakeTwo: argument 2 (number) must be of the type x, not d";
     static constexpr const char* kTooFew = "TakeTwo takes 2 arguments (a{sv}x), not 1";
   };
-  static constexpr bool kKnowsOwnersMethods = false;
 
   explicit DbusSide(MessagingListenerDelegate& delegate, AllocatorReclaimer* memory = nullptr)
-      : listener_(kNames, rigInterface(), bus_.address(), category_, memory) {
+      : listener_(kNames, rigInterface(), bus_.address(), category_, accounts_, memory) {
     listener_.setDelegate(delegate);
     listener_.resume();
   }
@@ -201,6 +200,7 @@ class DbusSide {
   PrivateBus bus_;
   MemoryLog log_;
   LogCategory category_{log_, "com.example", "twrs"};
+  TestAccounts accounts_;
   DbusListener listener_;
   std::unique_ptr<DbusCaller> caller_;
 };
@@ -223,13 +223,13 @@ TYPED_TEST(MessagingContractTest, TellsTheDelegateTheClientsProcessAndUser) {
   EXPECT_EQ(this->delegate.lastUserIdentifier, TypeParam::clientUser());
 }
 
-TYPED_TEST(MessagingContractTest, LetsItsOwnUserCallTheOwnersMethodsIfItHasThem) {
+TYPED_TEST(MessagingContractTest, LetsItsOwnUserCallTheMethodsForTrustedUsers) {
   this->side.connect();
   this->side.request("takeFromOwner", {Value(1)});
   const std::vector<Answer> answers = this->side.answers(1);
   ASSERT_THAT(answers, SizeIs(1));
-  EXPECT_EQ(answers[0].error.has_value(), !TypeParam::kKnowsOwnersMethods);
-  EXPECT_THAT(this->record.requests(), SizeIs(TypeParam::kKnowsOwnersMethods ? 1 : 0));
+  EXPECT_FALSE(answers[0].error);
+  EXPECT_THAT(this->record.requests(), SizeIs(1));
 }
 
 TYPED_TEST(MessagingContractTest, DoesNotServeAClientThatTheDelegateRejects) {

@@ -41,7 +41,8 @@ inline const RequestSet& rigInterface() {
           {"holdReply", {kNumber}, kAnswer},                 // keeps the reply only
           {"holdMap", {kMap}, kAnswer},                      // keeps the token and the reply
           {"holdLarge", {}, kAnswer, std::size_t{1} << 20},  // keeps both; its answer may have up to 1 MiB
-          {"takeFromOwner", {kNumber}, {}, 0, true},         // for the daemon's user only
+          {"takeFromOwner", {kNumber}, {}, 0, true},         // for trusted users
+          {"watch", {kNumber}, {}, 0, false, false, false, true},  // for the socket only
     }
   };
   return interface;

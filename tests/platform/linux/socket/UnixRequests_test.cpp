@@ -17,6 +17,7 @@
 #include "platform/linux/socket/UnixSocketListener.h"
 #include "protocol/Requests.h"
 #include "support/TemporaryDirectory.h"
+#include "support/TestAccounts.h"
 #include "support/memory/MemoryLog.h"
 #include "values/PackedMap.h"
 #include "values/ShapeTable.h"
@@ -182,7 +183,7 @@ class UnixRequestsTest : public testing::Test {
     std::string problem;
     auto socket = ServerSocket::open(path, problem);
     EXPECT_NE(socket, nullptr) << problem;
-    listener = std::make_unique<UnixSocketListener>(std::move(socket), category);
+    listener = std::make_unique<UnixSocketListener>(std::move(socket), category, accounts);
     listener->setDelegate(delegate);
     listener->resume();
   }
@@ -192,7 +193,7 @@ class UnixRequestsTest : public testing::Test {
     while (deliveries.calls().size() < count) {
       auto waiting = deliveries.takeWaiting();
       ASSERT_FALSE(waiting.empty()) << "only " << deliveries.calls().size() << " requests came";
-      for (const auto& requests : waiting) requests->deliver();
+      for (const auto& requests : waiting) EXPECT_TRUE(requests->deliver());
     }
   }
 
@@ -200,6 +201,7 @@ class UnixRequestsTest : public testing::Test {
   const std::string path = directory.path("reporting.sock");
   MemoryLog log;
   LogCategory category{log, "com.example", "twrs"};
+  TestAccounts accounts;
   Deliveries deliveries;
   LateDelegate delegate{deliveries};
   std::unique_ptr<UnixSocketListener> listener;
@@ -211,7 +213,7 @@ TEST_F(UnixRequestsTest, TheRequestsOfOneReadArePassedOnTogether) {
   const auto waiting = deliveries.takeWaiting();
   ASSERT_THAT(waiting, SizeIs(1));
   EXPECT_THAT(deliveries.calls(), SizeIs(0));
-  waiting[0]->deliver();
+  EXPECT_TRUE(waiting[0]->deliver());
   EXPECT_THAT(deliveries.methods(), ElementsAre("takeInt64", "takeMap", "takeInt64"));
   for (const auto& call : deliveries.calls()) EXPECT_EQ(call.thread, std::this_thread::get_id());
 }
@@ -250,7 +252,7 @@ TEST_F(UnixRequestsTest, QuickRequestsAreDeliveredUpToTheFirstThatIsNotAndTheOth
   ASSERT_THAT(waiting, SizeIs(1));
   EXPECT_FALSE(waiting[0]->deliverQuick());
   EXPECT_THAT(deliveries.methods(), ElementsAre("takeInt64", "takeInt64"));
-  waiting[0]->deliver();
+  EXPECT_TRUE(waiting[0]->deliver());
   EXPECT_THAT(deliveries.methods(), ElementsAre("takeInt64", "takeInt64", "takeMap", "takeInt64"));
   for (const std::uint32_t identifier : {1U, 2U, 3U, 4U}) {
     const auto response = client.response();
@@ -288,7 +290,7 @@ TEST_F(UnixRequestsTest, AMessageThatIsNotQuickIsKeptAndDeliveredWholeLater) {
   ASSERT_THAT(waiting, SizeIs(1));
   EXPECT_FALSE(waiting[0]->deliverQuick());
   EXPECT_THAT(deliveries.methods(), ElementsAre("message"));
-  waiting[0]->deliver();
+  EXPECT_TRUE(waiting[0]->deliver());
   ASSERT_THAT(deliveries.methods(), ElementsAre("message", "message", "message"));
   for (std::int64_t number = 1; number <= 3; ++number) {
     const auto call = deliveries.calls()[static_cast<std::size_t>(number - 1)];
@@ -304,7 +306,7 @@ TEST_F(UnixRequestsTest, ARequestThatIsNotQuickIsNotLookedAtBeforeItsTurn) {
   const auto waiting = deliveries.takeWaiting();
   ASSERT_THAT(waiting, SizeIs(1));
   EXPECT_FALSE(waiting[0]->deliverQuick());
-  waiting[0]->deliver();
+  EXPECT_TRUE(waiting[0]->deliver());
   const auto response = client.response();
   ASSERT_TRUE(response);
   EXPECT_TRUE(response->error.has_value());
@@ -384,7 +386,7 @@ TEST_F(UnixRequestsTest, RequestsOutliveTheirConnectionAndItsListener) {
   const auto waiting = deliveries.takeWaiting();
   ASSERT_THAT(waiting, SizeIs(1));
   listener = nullptr;
-  waiting[0]->deliver();
+  EXPECT_TRUE(waiting[0]->deliver());
   ASSERT_THAT(deliveries.calls(), SizeIs(1));
   EXPECT_EQ(deliveries.calls()[0].arguments, Arguments{Value(5)});
 }

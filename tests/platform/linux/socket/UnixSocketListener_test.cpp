@@ -29,6 +29,7 @@
 #include "platform/linux/threads/SystemClock.h"
 #include "support/OtherUser.h"
 #include "support/TemporaryDirectory.h"
+#include "support/TestAccounts.h"
 #include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
@@ -58,7 +59,7 @@ class UnixSocketListenerTest : public testing::Test {
     std::string problem;
     auto socket = ServerSocket::open(path, problem);
     EXPECT_NE(socket, nullptr) << problem;
-    listener = std::make_unique<UnixSocketListener>(std::move(socket), category);
+    listener = std::make_unique<UnixSocketListener>(std::move(socket), category, accounts);
     listener->setDelegate(delegate);
   }
 
@@ -89,6 +90,7 @@ class UnixSocketListenerTest : public testing::Test {
   const std::string path = directory.path("reporting.sock");
   MemoryLog log;
   LogCategory category{log, "com.example", "twrs"};
+  TestAccounts accounts;
   MessagingRecord record;
   RigDelegate delegate{record};
   std::unique_ptr<UnixSocketListener> listener;
@@ -212,16 +214,19 @@ TEST_F(UnixSocketListenerTest, ReportsTheUnknownMethodRatherThanItsArguments) {
 // another user. As any other user, it gives the listener another owner instead.
 class OtherUserTest : public UnixSocketListenerTest {
  protected:
+  ~OtherUserTest() override { listener = nullptr; }  // before the accounts
+
   void SetUp() override {
     if (::geteuid() != 0) {
       listener = nullptr;  // frees the path
       std::string problem;
-      listener = std::make_unique<UnixSocketListener>(ServerSocket::open(path, problem), category, nullptr,
-                                                      ::geteuid() + 1);
+      listener = std::make_unique<UnixSocketListener>(ServerSocket::open(path, problem), category, foreign);
       listener->setDelegate(delegate);
     }
     listener->resume();
   }
+
+  TestAccounts foreign{::geteuid() + 1};
 
   std::unique_ptr<RawClient> connectAsOtherUser() {
     if (::geteuid() != 0) return std::make_unique<RawClient>(path);
@@ -239,10 +244,9 @@ TEST_F(OtherUserTest, IsRefusedTheOwnersMethodsAndServedTheOthers) {
   ASSERT_TRUE(client->send(requestOf(1, "takeFromOwner", {Value(1)})));
   const std::optional<RpcFrame> response = client->response();
   ASSERT_TRUE(response && response->error && response->error->asMap());
-  const ValueMap expected{
-      {"domain", kMessagingErrorDomain},
-      {"code", 4},
-      {"message", "not permitted: takeFromOwner is for the user that the daemon runs as, and root"}};
+  const ValueMap expected{{"domain", kMessagingErrorDomain},
+                          {"code", 4},
+                          {"message", "not permitted: takeFromOwner is for trusted users"}};
   EXPECT_EQ(*response->error->asMap(), expected) << response->error->text();
   EXPECT_THAT(record.requests(), IsEmpty());
   expectServed(*client);
@@ -260,9 +264,9 @@ TEST_F(OtherUserTest, IsNotPermittedEvenWithWrongArguments) {
 TEST_F(UnixSocketListenerTest, ServesRootTheMethodsOfAnyOwner) {
   if (::geteuid() != 0) GTEST_SKIP() << "only root can be root";
   listener = nullptr;
+  TestAccounts foreign(12'345);
   std::string problem;
-  listener =
-      std::make_unique<UnixSocketListener>(ServerSocket::open(path, problem), category, nullptr, 12'345);
+  listener = std::make_unique<UnixSocketListener>(ServerSocket::open(path, problem), category, foreign);
   listener->setDelegate(delegate);
   listener->resume();
   RawClient client(path);
@@ -270,6 +274,7 @@ TEST_F(UnixSocketListenerTest, ServesRootTheMethodsOfAnyOwner) {
   const std::optional<RpcFrame> response = client.response();
   ASSERT_TRUE(response);
   EXPECT_FALSE(response->error);
+  listener = nullptr;  // before its accounts
 }
 
 TEST_F(UnixSocketListenerTest, EndsAConnectionThatSendsOtherBytesAndServesTheOthers) {
@@ -579,13 +584,14 @@ class FewDescriptorsTest : public testing::Test {
   const std::string path = directory.path("reporting.sock");
   MemoryLog log;
   LogCategory category{log, "com.example", "twrs"};
+  TestAccounts accounts;
   MessagingRecord record;
   RigDelegate delegate{record};
 };
 
 TEST_F(FewDescriptorsTest, LeavesHalfOfTheDescriptorsToTheDaemonAndLetsClientsWait) {
   std::string problem;
-  UnixSocketListener listener(ServerSocket::open(path, problem), category);
+  UnixSocketListener listener(ServerSocket::open(path, problem), category, accounts);
   listener.setDelegate(delegate);
   listener.resume();
   ::setrlimit(RLIMIT_NOFILE, &before_);
@@ -608,7 +614,7 @@ TEST_F(FewDescriptorsTest, LeavesHalfOfTheDescriptorsToTheDaemonAndLetsClientsWa
 
 TEST_F(FewDescriptorsTest, PausesWhenTheSystemHasNoDescriptorAndLogsThatOnce) {
   std::string problem;
-  UnixSocketListener listener(ServerSocket::open(path, problem), category);
+  UnixSocketListener listener(ServerSocket::open(path, problem), category, accounts);
   listener.setDelegate(delegate);
   listener.resume();
   // First one client connects and disconnects, and the text of an error is used. Without descriptors the
@@ -645,6 +651,7 @@ TEST(UnixSocketListenerWatchdogTest, IsFedByTheMessagingThreadWithoutAnyClient) 
   MemoryLog log;
   const LogCategory category{log, "com.example", "twrs"};
   const SystemClock clock;
+  TestAccounts accounts;
   std::string problem;
   auto socket = ServerSocket::open(directory.path("reporting.sock"), problem);
   ASSERT_NE(socket, nullptr) << problem;
@@ -654,7 +661,7 @@ TEST(UnixSocketListenerWatchdogTest, IsFedByTheMessagingThreadWithoutAnyClient) 
   auto feeder = std::make_unique<WatchdogFeeder>(1ms, clock, [&] {
     if (++pings == kEnough) enough.set_value();
   });
-  UnixSocketListener listener(std::move(socket), category, std::move(feeder));
+  UnixSocketListener listener(std::move(socket), category, accounts, std::move(feeder));
   MessagingRecord record;
   RigDelegate delegate(record);
   listener.setDelegate(delegate);
