@@ -87,6 +87,9 @@ class ReceivedRequests {
   // delivered one after the other.
   [[nodiscard]] virtual bool deliver() = 0;
 
+  // What the requests that are not delivered hold, about.
+  virtual std::size_t bytes() const { return 0; }
+
   // Does the same up to the first request of which the handler does not say that it is quick.
   [[nodiscard]] virtual bool deliverQuick() { return false; }
 };

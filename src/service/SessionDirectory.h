@@ -13,8 +13,8 @@ namespace tonewerk {
 
 class Account;
 
-// Finds a session by its identifier among the sessions that a user may reach: those of the user's own clients,
-// and for a trusted user those of all clients. Each user's identifiers are its own.
+// Finds a session by its identifier among the sessions that a user may reach: those of the user's own
+// clients, and for a trusted user those of all clients. Each user's identifiers are its own.
 //
 // Used on the work queue.
 class SessionDirectory {

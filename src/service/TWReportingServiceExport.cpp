@@ -180,7 +180,9 @@ void TWReportingServiceExport::handleReceived(std::unique_ptr<ReceivedRequests> 
     areAllDelivered = requests->deliverQuick();
   };
   if (turns_.runAtOnce(account_, deliverQuick) && areAllDelivered) return;
-  turns_.add(account_, [received = std::move(requests), account = account_, lines = lines_] {
+  Charge charge(account_, Resource::kUnfinishedBytes, requests->bytes());
+  turns_.add(account_, [received = std::move(requests), charge = std::move(charge), account = account_,
+                        lines = lines_] {
     const WorkingFor scope(account, lines.get());
     return received->deliver() ? TurnQueue::Progress::kDone : TurnQueue::Progress::kMore;
   });

@@ -29,9 +29,9 @@ class DbusListener final : public MessagingListener {
   static constexpr std::chrono::milliseconds kFirstPause{250};
   static constexpr std::chrono::milliseconds kLongestPause{60'000};
 
-  // `methods`, `log`, `accounts` and `memory` outlive the listener. Delegates export objects of these methods.
-  // `address` is a D-Bus address, empty for the system's bus. `memory` learns how many bytes clients send and
-  // when a client is gone. It may be null.
+  // `methods`, `log`, `accounts` and `memory` outlive the listener. Delegates export objects of these
+  // methods. `address` is a D-Bus address, empty for the system's bus. `memory` learns how many bytes clients
+  // send and when a client is gone. It may be null.
   DbusListener(DbusNames names, const RequestSet& methods, std::string address, const LogCategory& log,
                Accounts& accounts, AllocatorReclaimer* memory = nullptr);
   ~DbusListener() override;

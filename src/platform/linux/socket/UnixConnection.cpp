@@ -9,7 +9,6 @@
 #include <utility>
 
 #include "platform/Log.h"
-#include "platform/accounts/Accounts.h"
 #include "platform/linux/messaging/AllocatorReclaimer.h"
 #include "values/Bytes.h"
 
@@ -22,21 +21,23 @@ constexpr std::size_t kSliceBytes = 4096;
 
 }  // namespace
 
-UnixConnection::UnixConnection(const UnixConnectionContext& context, std::uint64_t identifier,
-                               FileDescriptor socket)
-    : context_(context),
-      identifier_(identifier),
-      socket_(std::move(socket)),
-      window_(std::make_shared<RequestWindow>(context.waker, identifier)),
-      outbox_(std::make_shared<ReplyOutbox>(socket_.get(), context.waker, identifier)) {
+UnixPeer UnixPeer::of(const FileDescriptor& socket) {
   ucred peer{};
   socklen_t size = sizeof(peer);
-  if (::getsockopt(socket_.get(), SOL_SOCKET, SO_PEERCRED, &peer, &size) == 0) {
-    processIdentifier_ = peer.pid;
-    userIdentifier_ = peer.uid;
-  }
-  account_ = context_.accounts.of(userIdentifier_);
+  if (::getsockopt(socket.get(), SOL_SOCKET, SO_PEERCRED, &peer, &size) != 0) return {};
+  return {peer.pid, peer.uid};
 }
+
+UnixConnection::UnixConnection(const UnixConnectionContext& context, UserIntake& intake,
+                               std::uint64_t identifier, FileDescriptor socket, const UnixPeer& peer)
+    : context_(context),
+      intake_(intake),
+      identifier_(identifier),
+      socket_(std::move(socket)),
+      peer_(peer),
+      readCharge_(intake.account, Resource::kReadBytes, 0),
+      window_(std::make_shared<RequestWindow>(context.waker, identifier)),
+      outbox_(std::make_shared<ReplyOutbox>(socket_.get(), context.waker, identifier)) {}
 
 UnixConnection::~UnixConnection() {
   outbox_->close();
@@ -44,14 +45,14 @@ UnixConnection::~UnixConnection() {
 }
 
 std::string UnixConnection::description() const {
-  return "connection " + std::to_string(identifier_) + " of process " + std::to_string(processIdentifier_) +
-         ", user " + std::to_string(userIdentifier_);
+  return "connection " + std::to_string(identifier_) + " of process " + std::to_string(peer_.process) +
+         ", user " + std::to_string(peer_.user);
 }
 
 void UnixConnection::setRequestHandler(const RequestSet& interface, std::shared_ptr<RequestHandler> object) {
   lastMethod_.reset();
   requestContext_ = std::make_shared<UnixRequestContext>(
-      UnixRequestContext{interface, std::move(object), context_.decoder, outbox_, window_, account_});
+      UnixRequestContext{interface, std::move(object), context_.decoder, outbox_, window_, intake_.account});
 }
 
 void UnixConnection::resume() {
@@ -70,17 +71,21 @@ void UnixConnection::handleEvents(std::uint32_t events) {
 void UnixConnection::handleWake() {
   if (hasEnded_) return;
   replies_ = outbox_->flush();
-  if (isPaused_ && hasRoom()) process(std::exchange(unprocessed_, {}));
+  if (isPaused_ && hasUsersRoom() && hasRoom()) process(std::exchange(unprocessed_, {}));
   updateInterest();
 }
 
 void UnixConnection::receive() {
-  const std::span<char> room = context_.slabs.room();
+  if (!hasUsersRoom()) {
+    isPaused_ = true;
+    return;
+  }
+  const std::span<char> room = intake_.slabs.room();
   const ssize_t count = ::recv(socket_.get(), room.data(), room.size(), MSG_DONTWAIT);
   if (count > 0) {
     const auto bytes = static_cast<std::size_t>(count);
     if (context_.memory != nullptr) context_.memory->clientSent(bytes);
-    return process(context_.slabs.commit(bytes));
+    return process(intake_.slabs.commit(bytes));
   }
   if (count == 0) return end();
   if (errno == EINTR) return;
@@ -102,6 +107,7 @@ void UnixConnection::process(SlabBytes received) {
     const std::string_view bytes = received.bytes;
     const RpcFrameScanner::Result result = scan(received.bytes);
     if (result != RpcFrameScanner::Result::kFrame) {
+      chargeRead();
       passOn(std::move(requests));
       if (result == RpcFrameScanner::Result::kBroken) endAsBroken(scanner_.problem());
       return;
@@ -124,7 +130,37 @@ void UnixConnection::process(SlabBytes received) {
   }
   isPaused_ = true;
   unprocessed_ = std::move(received);
+  chargeRead();
   passOn(std::move(requests));
+}
+
+bool UnixConnection::hasUsersRoom() {
+  const Account& user = *intake_.account;
+  if (!user.hasRoom(Resource::kUnfinishedBytes)) {
+    wakeWhenRoom(Resource::kUnfinishedBytes);
+    return false;
+  }
+  if (!unprocessed_.bytes.empty() || user.hasRoom(Resource::kReadBytes)) return true;
+  if (!begun_.empty() && intake_.mayContinueFrame(identifier_)) return true;
+  wakeWhenRoom(Resource::kReadBytes);
+  return false;
+}
+
+void UnixConnection::wakeWhenRoom(Resource resource) {
+  if (awaitsRoom_->exchange(true)) return;
+  intake_.account->whenRoom(resource, [waker = context_.waker, awaits = awaitsRoom_, number = identifier_] {
+    *awaits = false;
+    waker->wake(number);
+  });
+}
+
+// Bytes that wait hold their slab.
+void UnixConnection::chargeRead() {
+  if (begun_.empty() && unprocessed_.bytes.empty() && readCharge_.amount() == 0) return;
+  const std::size_t frame = begun_.empty() ? 0 : begun_.capacity();
+  readCharge_.setTo(frame + (unprocessed_.bytes.empty() ? 0 : sizeof(Slab)));
+  if (!begun_.empty()) return;
+  for (const std::uint64_t waiting : intake_.endFrame(identifier_)) context_.waker->wake(waiting);
 }
 
 // Most requests are of the method of the one before.
@@ -195,6 +231,9 @@ void UnixConnection::updateInterest() {
 void UnixConnection::end() {
   if (hasEnded_) return;
   hasEnded_ = true;
+  begun_ = {};
+  unprocessed_ = {};
+  chargeRead();
   outbox_->close();
   if (interest_ != 0) context_.epoll.remove(socket_.get());
   infoLog(context_.log, "%@ has ended", *this);

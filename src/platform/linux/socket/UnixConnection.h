@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <atomic>
 #include <cstddef>
 #include <cstdint>
 #include <functional>
@@ -18,24 +19,29 @@
 #include "platform/linux/messaging/Slab.h"
 #include "platform/linux/socket/ReplyOutbox.h"
 #include "platform/linux/socket/UnixRequests.h"
+#include "platform/linux/socket/UserIntake.h"
 #include "platform/linux/threads/IoWaker.h"
 
 namespace tonewerk {
 
-class Account;
-class Accounts;
 class AllocatorReclaimer;
 
 // What the connections of one listener's thread share.
 struct UnixConnectionContext {
   Epoll& epoll;
   std::shared_ptr<IoWaker> waker;
-  SlabPool& slabs;
   std::shared_ptr<RpcFrameDecoder> decoder;
   const LogCategory& log;
-  Accounts& accounts;
   // Learns how many bytes a client has sent, and when it is gone. May be null.
   AllocatorReclaimer* memory;
+};
+
+// The process at the other end of a socket, as the kernel reports it.
+struct UnixPeer {
+  static UnixPeer of(const FileDescriptor& socket);
+
+  std::int32_t process = 0;
+  std::uint32_t user = kNoUser;
 };
 
 // Serves one client's socket, on the listener's thread.
@@ -44,17 +50,19 @@ struct UnixConnectionContext {
 //   socket <- ReplyOutbox <- replies of any thread
 //
 // Frames are found here; their values are built where the request handler has them delivered. A connection
-// without room for requests is paused: bytes that were read and not used wait in unprocessed_, and the socket
-// is not read.
+// without room for requests, or whose user has none, is paused: bytes that were read and not used wait in
+// unprocessed_, and the socket is not read.
 class UnixConnection final : public MessagingConnection {
  public:
-  // `context` outlives the connection. `identifier` is its number in the epoll and the waker.
-  UnixConnection(const UnixConnectionContext& context, std::uint64_t identifier, FileDescriptor socket);
+  // `context` and `intake`, that of the peer's user, outlive the connection. `identifier` is its number in
+  // the epoll and the waker.
+  UnixConnection(const UnixConnectionContext& context, UserIntake& intake, std::uint64_t identifier,
+                 FileDescriptor socket, const UnixPeer& peer);
   ~UnixConnection() override;
 
-  std::int32_t processIdentifier() const override { return processIdentifier_; }
-  std::uint32_t userIdentifier() const override { return userIdentifier_; }
-  const std::shared_ptr<Account>& account() const override { return account_; }
+  std::int32_t processIdentifier() const override { return peer_.process; }
+  std::uint32_t userIdentifier() const override { return peer_.user; }
+  const std::shared_ptr<Account>& account() const override { return intake_.account; }
   std::string description() const override;
   void setRequestHandler(const RequestSet& interface, std::shared_ptr<RequestHandler> object) override;
   void setInterruptionHandler(std::function<void()> handler) override { interrupted_ = std::move(handler); }
@@ -82,13 +90,17 @@ class UnixConnection final : public MessagingConnection {
   void endAsBroken(std::string_view problem);
   void updateInterest();
   bool hasRoom() { return window_->hasRoom(outbox_->unsentBytes()); }
+  // Whether the user has room for what is read next. If not, the connection is woken when there is some.
+  [[nodiscard]] bool hasUsersRoom();
+  void wakeWhenRoom(Resource resource);
+  // Charges the user for the frame that has begun and for bytes that wait.
+  void chargeRead();
 
   const UnixConnectionContext& context_;
+  UserIntake& intake_;
   const std::uint64_t identifier_;
   FileDescriptor socket_;
-  std::int32_t processIdentifier_ = 0;
-  std::uint32_t userIdentifier_ = kNoUser;
-  std::shared_ptr<Account> account_;
+  const UnixPeer peer_;
 
   std::shared_ptr<const UnixRequestContext> requestContext_;  // null after the end
   std::function<void()> interrupted_;
@@ -99,6 +111,9 @@ class UnixConnection final : public MessagingConnection {
   RpcFrameScanner scanner_;
   std::optional<std::size_t> lastMethod_;
   std::string begun_;  // the bytes so far of a frame that did not arrive in one read
+  Charge readCharge_;  // for begun_ and unprocessed_
+  // Set while the connection is to be woken when its user has room.
+  const std::shared_ptr<std::atomic<bool>> awaitsRoom_ = std::make_shared<std::atomic<bool>>(false);
   std::shared_ptr<RequestWindow> window_;
   bool isPaused_ = false;
   SlabBytes unprocessed_;

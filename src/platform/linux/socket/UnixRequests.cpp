@@ -37,7 +37,9 @@ void UnixRequests::add(const RpcFrameScanner::Frame& frame, std::string_view byt
                        std::optional<std::size_t> method) {
   requests_.push_back(
       {{bytes, frame.argumentCount, frame.arguments}, frame.identifier, frame.isNotification, method});
-  context_->window->begin(bytesOf(requests_.back()));
+  const std::size_t size = bytesOf(requests_.back());
+  bytes_ += size;
+  context_->window->begin(size);
 }
 
 void UnixRequests::addFirst(const RpcFrameScanner::Frame& frame, std::string bytes,

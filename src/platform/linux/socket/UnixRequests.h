@@ -47,6 +47,7 @@ class UnixRequests final : public ReceivedRequests {
   // Adds the first request, whose bytes came with several reads.
   void addFirst(const RpcFrameScanner::Frame& frame, std::string bytes, std::optional<std::size_t> method);
 
+  std::size_t bytes() const override { return bytes_; }
   [[nodiscard]] bool deliver() override;
   [[nodiscard]] bool deliverQuick() override;
   // Delivers on the messaging thread, while another thread may deliver other requests of the same listener.
@@ -78,6 +79,7 @@ class UnixRequests final : public ReceivedRequests {
   std::string first_;
   std::vector<Request> requests_;
   std::size_t delivered_ = 0;
+  std::size_t bytes_ = 0;  // of requests_, as they count in the window
 };
 
 }  // namespace tonewerk

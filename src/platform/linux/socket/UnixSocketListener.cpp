@@ -12,6 +12,8 @@
 #include <utility>
 
 #include "platform/Log.h"
+#include "platform/accounts/Accounts.h"
+#include "platform/accounts/WorkingFor.h"
 #include "platform/linux/messagepack/RpcFrameDecoder.h"
 #include "platform/linux/threads/BatchScope.h"
 
@@ -20,6 +22,9 @@ namespace {
 
 // The most connections accepted in one round, so that existing connections are served in between.
 constexpr int kMaxAcceptsAtOnce = 16;
+
+// After this time it looks which further connections are ready, because they may be another user's.
+constexpr std::chrono::milliseconds kRound{1};
 
 std::size_t descriptorsForClients() {
   rlimit limit{};
@@ -35,9 +40,12 @@ UnixSocketListener::UnixSocketListener(std::unique_ptr<ServerSocket> socket, con
                                        AllocatorReclaimer* memory)
     : socket_(std::move(socket)),
       log_(log),
-      context_{epoll_, waker_, slabs_, std::make_shared<RpcFrameDecoder>(), log_, accounts, memory},
+      accounts_(accounts),
+      context_{epoll_, waker_, std::make_shared<RpcFrameDecoder>(), log_, memory},
       watchdog_(std::move(watchdog)),
-      maxConnections_(descriptorsForClients()) {}
+      maxConnections_(descriptorsForClients()) {
+  accounts_.totals().setTotal(Resource::kConnections, maxConnections_);
+}
 
 UnixSocketListener::~UnixSocketListener() { shutDown(); }
 
@@ -67,7 +75,9 @@ void UnixSocketListener::run() {
   infoLog(log_, "listening at %@", socket_->name());
   while (!isStopping_) {
     const BatchScope round;
-    for (const Epoll::Event& event : epoll_.wait(timeToNextRound())) handle(event);
+    const auto timeout = ready_.empty() ? timeToNextRound() : std::chrono::milliseconds::zero();
+    for (const Epoll::Event& event : epoll_.wait(timeout)) handle(event);
+    serveQueued();
     if (acceptAgainAt_ && std::chrono::steady_clock::now() >= *acceptAgainAt_) resumeAccepting();
     if (watchdog_ != nullptr) watchdog_->pingIfDue();
   }
@@ -77,21 +87,55 @@ void UnixSocketListener::run() {
 void UnixSocketListener::handle(const Epoll::Event& event) {
   if (event.identifier == kSocket) return accept();
   if (event.identifier == kWaker) return handleWakes();
-  // A connection that ended earlier in this round is no longer in the map.
-  const auto found = connections_.find(event.identifier);
-  if (found == connections_.end()) return;
-  found->second->handleEvents(event.events);
-  removeIfEnded(event.identifier);
+  queue(event.identifier, event.events, false);
 }
 
 void UnixSocketListener::handleWakes() {
-  for (const std::uint64_t identifier : waker_->take()) {
-    const auto found = connections_.find(identifier);
-    if (found == connections_.end()) continue;
-    found->second->handleWake();
-    removeIfEnded(identifier);
-  }
+  for (const std::uint64_t identifier : waker_->take()) queue(identifier, 0, true);
   if (mustRestore_.exchange(false)) recreateSocket();
+}
+
+void UnixSocketListener::queue(std::uint64_t identifier, std::uint32_t events, bool isWoken) {
+  const auto found = connections_.find(identifier);
+  if (found == connections_.end()) return;  // it has ended
+  Entry& entry = found->second;
+  entry.events |= events;
+  entry.isWoken |= isWoken;
+  if (std::exchange(entry.isQueued, true)) return;
+  if (entry.intake->ready.empty()) ready_.push_back(entry.intake);
+  entry.intake->ready.push_back(identifier);
+}
+
+void UnixSocketListener::serveQueued() {
+  std::optional<std::chrono::steady_clock::time_point> end;
+  while (!ready_.empty()) {
+    UserIntake& user = *ready_.front();
+    ready_.pop_front();
+    const std::uint64_t identifier = user.ready.front();
+    user.ready.pop_front();
+    if (!user.ready.empty()) ready_.push_back(&user);
+    serve(identifier);
+    if (ready_.empty()) return;
+    const auto now = std::chrono::steady_clock::now();
+    if (!end) end = now + kRound;
+    if (now >= *end) return;
+  }
+}
+
+void UnixSocketListener::serve(std::uint64_t identifier) {
+  const auto found = connections_.find(identifier);
+  if (found == connections_.end()) return;
+  Entry& entry = found->second;
+  entry.isQueued = false;
+  const std::uint32_t events = std::exchange(entry.events, 0);
+  const bool isWoken = std::exchange(entry.isWoken, false);
+  const WorkingFor scope(entry.intake->account);
+  if (events != 0) {
+    entry.connection->handleEvents(events);
+  } else if (isWoken) {
+    entry.connection->handleWake();
+  }
+  if (entry.connection->hasEnded()) remove(identifier);
 }
 
 void UnixSocketListener::restoreSocket() {
@@ -135,14 +179,38 @@ void UnixSocketListener::accept() {
 }
 
 void UnixSocketListener::add(FileDescriptor socket) {
+  const UnixPeer peer = UnixPeer::of(socket);
+  const std::shared_ptr<Account> account = accounts_.of(peer.user);
+  const WorkingFor scope(account);
+  if (!account->take(Resource::kConnections, 1)) {
+    errorLog(log_, "user %u has %lu connections and gets no more: process %i is turned away", peer.user,
+             account->held(Resource::kConnections), peer.process);
+    return;
+  }
+  UserIntake& intake = intakeOf(account);
   const std::uint64_t identifier = nextIdentifier_++;
-  auto connection = std::make_unique<UnixConnection>(context_, identifier, std::move(socket));
+  auto connection = std::make_unique<UnixConnection>(context_, intake, identifier, std::move(socket), peer);
   infoLog(log_, "new %@", *connection);
   if (!delegate_->listenerShouldAcceptNewConnection(*connection)) {
     infoLog(log_, "%@ was turned away", *connection);
-    return;
+    connection = nullptr;
+    return leave(intake);
   }
-  connections_.emplace(identifier, std::move(connection));
+  connections_.emplace(identifier, Entry{std::move(connection), &intake});
+}
+
+UserIntake& UnixSocketListener::intakeOf(const std::shared_ptr<Account>& account) {
+  std::unique_ptr<UserIntake>& intake = intakes_[account.get()];
+  if (intake == nullptr) intake = std::make_unique<UserIntake>(account);
+  ++intake->connections;
+  return *intake;
+}
+
+void UnixSocketListener::leave(UserIntake& intake) {
+  intake.account->give(Resource::kConnections, 1);
+  if (--intake.connections > 0) return;
+  std::erase(ready_, &intake);
+  intakes_.erase(intake.account.get());
 }
 
 void UnixSocketListener::pauseAccepting(const std::string& why) {
@@ -175,17 +243,22 @@ std::optional<std::chrono::milliseconds> UnixSocketListener::timeToNextRound() c
   return accept ? std::min(*accept, watchdog_->timeToNext()) : watchdog_->timeToNext();
 }
 
-void UnixSocketListener::removeIfEnded(std::uint64_t identifier) {
+void UnixSocketListener::remove(std::uint64_t identifier) {
   const auto found = connections_.find(identifier);
-  if (found == connections_.end() || !found->second->hasEnded()) return;
+  UserIntake& intake = *found->second.intake;
   connections_.erase(found);
+  leave(intake);
   if (acceptAgainAt_) resumeAccepting();
 }
 
 void UnixSocketListener::endAll() {
   socket_ = nullptr;
-  for (const auto& [identifier, connection] : connections_) connection->end();
-  connections_.clear();
+  acceptAgainAt_.reset();
+  for (const auto& [identifier, entry] : connections_) {
+    const WorkingFor scope(entry.intake->account);
+    entry.connection->end();
+  }
+  while (!connections_.empty()) remove(connections_.begin()->first);
 }
 
 }  // namespace tonewerk

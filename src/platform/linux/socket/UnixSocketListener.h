@@ -5,6 +5,7 @@
 #include <chrono>
 #include <cstddef>
 #include <cstdint>
+#include <deque>
 #include <memory>
 #include <optional>
 #include <thread>
@@ -12,18 +13,22 @@
 
 #include "platform/Messaging.h"
 #include "platform/linux/descriptors/Epoll.h"
-#include "platform/linux/messaging/Slab.h"
 #include "platform/linux/socket/ServerSocket.h"
 #include "platform/linux/socket/UnixConnection.h"
+#include "platform/linux/socket/UserIntake.h"
 #include "platform/linux/system/WatchdogFeeder.h"
 #include "platform/linux/threads/IoWaker.h"
 #include "values/Mutex.h"
 
 namespace tonewerk {
 
+class Accounts;
+
 // Serves clients over a Unix socket, all of them on one thread of its own, the messaging thread.
 //
-// In every round each connection that is ready is read once, so that no client can keep the others waiting.
+// Connections that are ready are read once each, and the users take turns, so that no client can keep the
+// others waiting. A user gets its share of the connections; a further one is closed at once.
+//
 // At least kReservedDescriptors (or half of all, if that is less) are left for the daemon's own files.
 // Further clients wait in the socket's backlog.
 class UnixSocketListener final : public MessagingListener {
@@ -55,18 +60,34 @@ class UnixSocketListener final : public MessagingListener {
   static constexpr std::uint64_t kWaker = 1;
 
   void run();
+  struct Entry {
+    std::unique_ptr<UnixConnection> connection;
+    UserIntake* intake;
+    // What has happened since the connection was last served.
+    std::uint32_t events = 0;
+    bool isWoken = false;
+    bool isQueued = false;
+  };
+
   void handle(const Epoll::Event& event);
   void handleWakes();
+  void queue(std::uint64_t identifier, std::uint32_t events, bool isWoken);
+  // Serves connections that are queued, for about kRound.
+  void serveQueued();
+  void serve(std::uint64_t identifier);
   void accept();
   void recreateSocket();
   void add(FileDescriptor socket);
+  UserIntake& intakeOf(const std::shared_ptr<Account>& account);
+  void leave(UserIntake& intake);
   void pauseAccepting(const std::string& why);
   void resumeAccepting();
   // Adds the listening socket to the epoll. If that fails it pauses accepting, and so tries again later.
   void watchSocket();
   std::optional<std::chrono::milliseconds> timeToNextAccept() const;
   std::optional<std::chrono::milliseconds> timeToNextRound() const;
-  void removeIfEnded(std::uint64_t identifier);
+  // Removes a connection that has ended.
+  void remove(std::uint64_t identifier);
   void endAll();
 
   std::unique_ptr<ServerSocket> socket_;
@@ -76,11 +97,14 @@ class UnixSocketListener final : public MessagingListener {
   // Used by the messaging thread only.
   Epoll epoll_;
   const std::shared_ptr<IoWaker> waker_ = std::make_shared<IoWaker>();
-  SlabPool slabs_;
+  Accounts& accounts_;
   const UnixConnectionContext context_;
+  // Of the users that have connections.
+  std::unordered_map<const Account*, std::unique_ptr<UserIntake>> intakes_;
+  std::deque<UserIntake*> ready_;  // users with connections to be served, in the order of their turns
   const std::unique_ptr<WatchdogFeeder> watchdog_;  // null without a watchdog
   const std::size_t maxConnections_;
-  std::unordered_map<std::uint64_t, std::unique_ptr<UnixConnection>> connections_;
+  std::unordered_map<std::uint64_t, Entry> connections_;
   std::uint64_t nextIdentifier_ = kWaker + 1;
   std::optional<std::chrono::steady_clock::time_point> acceptAgainAt_;  // set while accepting is paused
   bool hasLoggedPause_ = false;
