@@ -16,6 +16,7 @@ constexpr double kMaxInt32 = std::numeric_limits<std::int32_t>::max();
 constexpr std::string_view kMetricon = "com.orvane.metricon";
 constexpr std::string_view kLinkReport = "com.orvane.linkreport";
 constexpr std::string_view kStore = "com.orvane.tonewerk.store";
+constexpr std::string_view kService = "com.orvane.tonewerk.service";
 constexpr std::string_view kDiagnostics = "com.orvane.tonewerk.diagnostics";
 constexpr std::string_view kTwreporting = "com.orvane.tonewerk.twreporting";
 constexpr std::string_view kCaptures = "com.orvane.tonewerk.captures";
@@ -32,6 +33,10 @@ std::vector<Preference> allPreferences() {
       {kLinkReport, "event_name_attribute", kBoolean, false, "Event names as an attribute, too"},
       {kStore, "max_megabytes", kNumber, 256, "MiB that the store takes, its log included", 1.0},
       {kStore, "max_days", kNumber, 30, "Age of the oldest report in days", 1.0},
+      {kService, "trusted_users", kUsers, ValueArray{}, "Who reaches all users' sessions, beside root"},
+      {kService, "unfinished_megabytes", kNumber, 128, "MiB of requests under way, of all users", 1.0},
+      {kService, "kept_megabytes", kNumber, 512, "MiB that sessions keep, of all users", 1.0},
+      {kService, "snapshot_megabytes", kNumber, 64, "MiB of driver statistics, of all users", 1.0},
       {kDiagnostics, "max_megabytes", kNumber, 256, "MiB of captures, drafts and stall traces", 1.0},
       {kDiagnostics, "max_items", kNumber, 500, "How many of them are kept", 1.0},
       {kTwreporting,
@@ -101,6 +106,10 @@ bool suits(const Preference& preference, const Value& value) {
       return value.asString() != nullptr;
     case kTexts:
       return isArray(preference, value, [](const Value& entry) { return entry.asString() != nullptr; });
+    case kUsers:
+      return isArray(preference, value, [](const Value& entry) {
+        return entry.asString() != nullptr || entry.asInteger() != nullptr;
+      });
     case kTables:
       return isArray(preference, value, [](const Value& entry) { return entry.asMap() != nullptr; });
     case kTable:
@@ -154,6 +163,8 @@ std::string typeText(const Preference& preference) {
       return "text";
     case kTexts:
       return preference.count == 2 ? "array of two texts" : "array of texts";
+    case kUsers:
+      return "array of users' names or numbers";
     case kTables:
       return "array of tables";
     case kTable:

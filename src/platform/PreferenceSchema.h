@@ -11,7 +11,7 @@
 
 namespace tonewerk {
 
-enum class PreferenceType { kBoolean, kInteger, kNumber, kText, kTexts, kTables, kTable, kAny };
+enum class PreferenceType { kBoolean, kInteger, kNumber, kText, kTexts, kUsers, kTables, kTable, kAny };
 
 // Who sets a preference: people and packages, or the daemon, which stores there what it must remember.
 enum class PreferenceKeeper { kPeople, kDaemon };

@@ -22,6 +22,7 @@ namespace requests {
 inline constexpr std::size_t kMaxReportersBytes = std::size_t{512} << 10;
 inline constexpr std::size_t kMaxSessionListingBytes = std::size_t{512} << 10;
 inline constexpr std::size_t kMaxMessagesBytes = std::size_t{512} << 10;
+inline constexpr std::size_t kMaxAccountListingBytes = std::size_t{512} << 10;
 
 inline constexpr Parameter kReporterID{"reporterID", ParameterType::kInt64};
 inline constexpr Result kSuccess{ResultType::kBoolean, "success"};
@@ -85,6 +86,12 @@ inline constexpr Method kWatchNextMessages{.name = "watch.nextMessages",
                                            .forTrusted = true,
                                            .isForSocketOnly = true};
 
+// What users hold. An ordinary user sees its own account, a trusted one all.
+inline constexpr Method kWatchAccounts{.name = "watch.accounts",
+                                       .result = {ResultType::kAny, "accounts"},
+                                       .replyBytes = kMaxAccountListingBytes,
+                                       .isForSocketOnly = true};
+
 // All requests, in the order in which they are listed to people.
 inline constexpr std::array kAll{kCreateReportingSession,
                                  kSetServiceType,
@@ -100,7 +107,8 @@ inline constexpr std::array kAll{kCreateReportingSession,
                                  kObserve,
                                  kWatchSessions,
                                  kWatchOpenMessages,
-                                 kWatchNextMessages};
+                                 kWatchNextMessages,
+                                 kWatchAccounts};
 const RequestSet& all();
 
 }  // namespace requests

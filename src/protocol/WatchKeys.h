@@ -24,5 +24,14 @@ inline const SharedString kWatchKeySingleMessageSession("singleMessageSession");
 inline const SharedString kWatchKeyProcessIdentifier("processIdentifier");
 inline const SharedString kWatchKeyProcessName("processName");
 inline const SharedString kWatchKeySeconds("seconds");
+inline const SharedString kWatchKeyAccounts("accounts");
+inline const SharedString kWatchKeyUser("user");
+inline const SharedString kWatchKeyTrusted("trusted");
+inline const SharedString kWatchKeyLinesHeldBack("linesHeldBack");
+inline const SharedString kWatchKeyResources("resources");
+inline const SharedString kWatchKeyName("name");
+inline const SharedString kWatchKeyHeld("held");
+inline const SharedString kWatchKeyShare("share");
+inline const SharedString kWatchKeyRefused("refused");
 
 }  // namespace tonewerk

@@ -114,6 +114,7 @@ constexpr Handler kHandlers[] = {
      [](const Targets& to, Incoming& in) {
        to.watch.nextMessages(std::move(in.reply), std::move(in.token));
      }},
+    {requests::kWatchAccounts.name, [](const Targets& to, Incoming& in) { to.watch.accounts(in.reply); }},
 };
 
 constexpr std::size_t kNoHandler = std::size(kHandlers);

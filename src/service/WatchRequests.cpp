@@ -7,8 +7,11 @@
 #include <utility>
 
 #include "platform/Log.h"
+#include "platform/Platform.h"
 #include "platform/SerialQueue.h"
+#include "platform/accounts/Accounts.h"
 #include "platform/accounts/TurnQueue.h"
+#include "service/AccountListing.h"
 #include "service/MessageTap.h"
 #include "service/SessionListing.h"
 #include "service/TWReportingServiceDelegateProtocol.h"
@@ -89,6 +92,10 @@ void WatchRequests::nextMessages(Reply reply, InFlightToken token) {
         answer(messagingError(kInvalidArguments, "watch.nextMessages: watch.openMessages comes first"));
       },
       std::move(reply), std::move(token));
+}
+
+void WatchRequests::accounts(const Reply& reply) const {
+  reply(std::nullopt, accountListing(TWReportingContext::current().platform().accounts, *account_));
 }
 
 }  // namespace tonewerk

@@ -24,6 +24,7 @@ class WatchRequests {
   void sessions(const Arguments& arguments, Reply reply, InFlightToken token);
   void openMessages(const Arguments& arguments, Reply reply, InFlightToken token);
   void nextMessages(Reply reply, InFlightToken token);
+  void accounts(const Reply& reply) const;
 
  private:
   // Runs `body` with the service on the work queue. `body` must not refer to this object, which ends with the

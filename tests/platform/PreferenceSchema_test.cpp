@@ -63,14 +63,16 @@ TEST(PreferenceSchemaTest, DistinguishesTypes) {
       {PreferenceType::kNumber, 2.5},
       {PreferenceType::kText, "a"},
       {PreferenceType::kTexts, ValueArray{"a"}},
+      {PreferenceType::kUsers, ValueArray{"a", 1}},
       {PreferenceType::kTables, ValueArray{ValueMap{{"a", 1}}}},
       {PreferenceType::kTable, ValueMap{{"a", 1}}},
   };
   for (const auto& [type, own] : fitting) {
     for (const auto& [otherType, value] : fitting) {
       const Preference preference{.domain = "d", .key = "k", .type = type, .fallback = {}, .meaning = "m"};
-      const bool suits =
-          type == otherType || (type == PreferenceType::kNumber && otherType == PreferenceType::kInteger);
+      const bool suits = type == otherType ||
+                         (type == PreferenceType::kNumber && otherType == PreferenceType::kInteger) ||
+                         (type == PreferenceType::kUsers && otherType == PreferenceType::kTexts);
       EXPECT_EQ(problemWith(preference, value).has_value(), !suits)
           << typeText(preference) << " " << value.text();
     }

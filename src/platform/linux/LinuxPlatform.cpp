@@ -27,6 +27,7 @@
 #include "platform/linux/preferences/PreferenceWatcher.h"
 #include "platform/linux/preferences/TomlDeviceFacts.h"
 #include "platform/linux/preferences/TomlPreferenceStore.h"
+#include "platform/linux/system/AccountPreferences.h"
 #include "platform/linux/system/LinuxProcessInformation.h"
 #include "platform/linux/system/LinuxSystemInformation.h"
 #include "platform/linux/threads/LinuxDetachedThreads.h"
@@ -96,7 +97,9 @@ struct LinuxPlatform::Adapters {
 };
 
 LinuxPlatform::LinuxPlatform(const Directories& directories)
-    : adapters_(std::make_unique<Adapters>(directories)) {}
+    : adapters_(std::make_unique<Adapters>(directories)) {
+  applyAccountPreferences(adapters_->accounts, adapters_->preferences, adapters_->category);
+}
 LinuxPlatform::~LinuxPlatform() = default;
 
 Log& LinuxPlatform::log() { return *adapters_->log; }
@@ -114,6 +117,7 @@ DiagnosticsStore& LinuxPlatform::diagnostics() { return adapters_->diagnostics; 
 void LinuxPlatform::readConfigurationAgain() {
   adapters_->deviceFacts.readAgain();
   adapters_->preferences.checkAllFiles();
+  applyAccountPreferences(adapters_->accounts, adapters_->preferences, adapters_->category);
   adapters_->notifications.callAllHandlers();  // users of preferences read them again then
 }
 

@@ -27,6 +27,7 @@ int runCommandLine(int argc, const char* const* argv, Tool& tool) {
       "usage, a bad recording included; 3 no daemon answers.");
   app.require_subcommand(1);
   addCommonOptions(app, tool);
+  addStatusCommand(app, tool);
   addListCommand(app, tool);
   addValidateCommand(app, tool);
   addSendCommand(app, tool);

@@ -1,0 +1,47 @@
+// SPDX-License-Identifier: Apache-2.0
+#include <CLI/CLI.hpp>
+#include <optional>
+#include <ostream>
+
+#include "protocol/Requests.h"
+#include "protocol/WatchKeys.h"
+#include "tools/twctl/DaemonCalls.h"
+#include "tools/twctl/commands/Commands.h"
+#include "tools/twctl/show/AccountTable.h"
+
+namespace tonewerk {
+namespace {
+
+void showStatus(Tool& tool) {
+  DaemonCalls daemon(tool);
+  std::optional<Value> answer;
+  if (!daemon.connect(DaemonCalls::Role::kOnlooker) ||
+      !daemon.call(requests::kWatchAccounts.name, {}, answer))
+    return;
+  const ValueMap* listing = answer ? answer->asMap() : nullptr;
+  const Value* found = listing == nullptr ? nullptr : listing->find(kWatchKeyAccounts);
+  const ValueArray* accounts = found == nullptr ? nullptr : found->asArray();
+  if (accounts == nullptr) return;
+  {
+    AccountTable table(tool);
+    for (const Value& account : *accounts) {
+      if (account.asMap() != nullptr) table.add(*account.asMap());
+    }
+  }
+  const auto total = static_cast<std::uint64_t>(listing->integer(kWatchKeyTotal));
+  if (total > accounts->size() && !tool.asJson) {
+    tool.out << "and " << total - accounts->size() << " more users\n";
+  }
+}
+
+}  // namespace
+
+void addStatusCommand(CLI::App& app, Tool& tool) {
+  CLI::App& command = addCommand(app, tool, "status", "What each user holds in the daemon, and was refused");
+  command.footer(
+      "A row for each thing that a user's clients hold: how much, the most they may hold now, and how often\n"
+      "more was refused. Trusted users see all users, others themselves.");
+  command.callback([&tool] { showStatus(tool); });
+}
+
+}  // namespace tonewerk
