@@ -16,8 +16,8 @@ namespace tonewerk {
 // What the messaging thread has for one user: the slabs that the user's clients fill, and whose turn it is.
 // The user has slabs of its own, so that requests which wait hold no memory of others.
 //
-// Frames that have not arrived as a whole may take as much as the user's share. When they take that much, only
-// one of the connections that have such a frame is read, until its frame is complete; then the next one.
+// Frames that have not arrived as a whole may take as much as the user's share. When they take that much,
+// only one of the connections that have such a frame is read, until its frame is complete; then the next one.
 // Otherwise none of the frames would ever be complete.
 class UserIntake {
  public:
