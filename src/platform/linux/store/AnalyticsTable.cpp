@@ -10,9 +10,9 @@ namespace tonewerk {
 static_assert(kStoreNamesPerRow == 2, "an event has two names at most");
 
 AnalyticsTable::AnalyticsTable(SqliteDatabase& database) : database_(database) {
-  database.addRows("new_analytics_row", 6, *this);
-  const std::string columns = "recorded_at, name_set, payload, rtc_session, rtc_bits";
-  const std::string values = "c1, c2, c3, c4, c5 FROM new_analytics_row";
+  database.addRows("new_analytics_row", 7, *this);
+  const std::string columns = "recorded_at, name_set, payload, rtc_session, rtc_bits, user_id";
+  const std::string values = "c1, c2, c3, c4, c5, c6 FROM new_analytics_row";
   insertRows_ = database.prepare("INSERT INTO analytics_row (id, " + columns + ") SELECT c0, " + values);
   insertNextRows_ = database.prepare("INSERT INTO analytics_row (" + columns + ") SELECT " + values);
 }
@@ -48,8 +48,11 @@ void AnalyticsTable::read(std::size_t row, int column, SqliteCell& cell) const {
     case 4:
       if (event.rtc) cell.set(batch_->sessions()[event.rtc->session]->place.identifier);
       return;
-    default:
+    case 5:
       if (event.rtc) cell.set(rtcBits(event.rtc->category, event.rtc->type, event.rtc->hidden));
+      return;
+    default:
+      return cell.setUser(event.user);
   }
 }
 

@@ -4,9 +4,9 @@
 namespace tonewerk {
 
 MetricTable::MetricTable(SqliteDatabase& database) {
-  database.addRows("new_metric", 3, *this);
+  database.addRows("new_metric", 4, *this);
   insertRows_ = database.prepare(
-      "INSERT INTO metric (posted_at, identifier, record) SELECT c0, c1, c2 FROM new_metric");
+      "INSERT INTO metric (posted_at, identifier, record, user_id) SELECT c0, c1, c2, c3 FROM new_metric");
 }
 
 bool MetricTable::insert(const StoreBatch& batch) {
@@ -26,8 +26,10 @@ void MetricTable::read(std::size_t row, int column, SqliteCell& cell) const {
       return cell.set(metric.postedAt);
     case 1:
       return cell.set(static_cast<std::int64_t>(metric.identifier));
-    default:
+    case 2:
       return cell.setBytes(batch_->text(metric.record));
+    default:
+      return cell.setUser(metric.user);
   }
 }
 

@@ -4,10 +4,10 @@
 namespace tonewerk {
 
 PowerTable::PowerTable(SqliteDatabase& database) {
-  database.addRows("new_power_event", 4, *this);
+  database.addRows("new_power_event", 5, *this);
   insertRows_ = database.prepare(
-      "INSERT INTO power_event (recorded_at, event_group, name, payload)"
-      " SELECT c0, c1, c2, c3 FROM new_power_event");
+      "INSERT INTO power_event (recorded_at, event_group, name, payload, user_id)"
+      " SELECT c0, c1, c2, c3, c4 FROM new_power_event");
 }
 
 bool PowerTable::insert(const StoreBatch& batch) {
@@ -29,8 +29,10 @@ void PowerTable::read(std::size_t row, int column, SqliteCell& cell) const {
       return cell.set(event.group);
     case 2:
       return cell.set(batch_->text(event.name));
-    default:
+    case 3:
       return cell.set(batch_->text(event.payload));
+    default:
+      return cell.setUser(event.user);
   }
 }
 

@@ -12,11 +12,11 @@ RtcTable::RtcTable(SqliteDatabase& database, const JsonService& json, std::uint6
       json_(json),
       fileNumber_(fileNumber),
       insertSession_(database.prepare(
-          "INSERT INTO rtc_session (started_at, session_info, user_info) VALUES (?1, ?2, ?3)")) {
-  database.addRows("new_rtc_row", 6, *this);
+          "INSERT INTO rtc_session (started_at, session_info, user_info, user_id) VALUES (?1, ?2, ?3, ?4)")) {
+  database.addRows("new_rtc_row", 7, *this);
   insertMessages_ = database.prepare(
-      "INSERT INTO rtc_row (id, sent_at, rtc_session, category, type, payload)"
-      " SELECT c0, c1, c2, c3, c4, c5 FROM new_rtc_row");
+      "INSERT INTO rtc_row (id, sent_at, rtc_session, category, type, payload, user_id)"
+      " SELECT c0, c1, c2, c3, c4, c5, c6 FROM new_rtc_row");
 }
 
 RtcTable::~RtcTable() {
@@ -24,8 +24,9 @@ RtcTable::~RtcTable() {
 }
 
 bool RtcTable::insertSessions(const StoreBatch& batch) {
-  for (const auto& session : batch.sessions()) {
-    if (!has(*session) && !insertSession(session)) return false;
+  for (std::size_t at = 0; at < batch.sessions().size(); ++at) {
+    const auto& session = batch.sessions()[at];
+    if (!has(*session) && !insertSession(session, batch.sessionUsers()[at])) return false;
   }
   return true;
 }
@@ -56,19 +57,26 @@ void RtcTable::read(std::size_t row, int column, SqliteCell& cell) const {
       return cell.set(static_cast<std::int64_t>(message.category));
     case 4:
       return cell.set(static_cast<std::int64_t>(message.type));
-    default:
+    case 5:
       return cell.set(batch_->text(message.payload));
+    default:
+      return cell.setUser(message.user);
   }
 }
 
 bool RtcTable::has(const RtcSessionRecord& session) const { return session.place.file == fileNumber_; }
 
-bool RtcTable::insertSession(const std::shared_ptr<RtcSessionRecord>& session) {
+bool RtcTable::insertSession(const std::shared_ptr<RtcSessionRecord>& session, std::uint32_t user) {
   const std::string sessionInfo = json_.compact(session->sessionInfo);
   const std::string userInfo = json_.compact(session->userInfo);
   insertSession_.bind(1, session->startedAt);
   insertSession_.bind(2, sessionInfo);
   insertSession_.bind(3, userInfo);
+  if (user == kNoUser) {
+    insertSession_.bindNull(4);
+  } else {
+    insertSession_.bind(4, static_cast<std::int64_t>(user));
+  }
   if (!insertSession_.run()) return false;
   const auto identifier = database_.number("SELECT last_insert_rowid()");
   if (!identifier) return false;

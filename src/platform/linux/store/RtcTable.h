@@ -41,7 +41,7 @@ class RtcTable final : private SqliteRows {
   std::size_t rowCount() const override;
   void read(std::size_t row, int column, SqliteCell& cell) const override;
   bool has(const RtcSessionRecord& session) const;
-  [[nodiscard]] bool insertSession(const std::shared_ptr<RtcSessionRecord>& session);
+  [[nodiscard]] bool insertSession(const std::shared_ptr<RtcSessionRecord>& session, std::uint32_t user);
 
   SqliteDatabase& database_;
   const JsonService& json_;

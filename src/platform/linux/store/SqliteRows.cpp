@@ -6,6 +6,7 @@
 #include <string>
 
 #include "platform/linux/store/SqliteDatabase.h"
+#include "protocol/RequestSet.h"
 
 namespace tonewerk {
 namespace {
@@ -107,6 +108,10 @@ const sqlite3_module kModule = [] {
 }  // namespace
 
 void SqliteCell::set(std::int64_t number) { sqlite3_result_int64(context_, number); }
+
+void SqliteCell::setUser(std::uint32_t user) {
+  if (user != kNoUser) set(static_cast<std::int64_t>(user));
+}
 
 void SqliteCell::set(double number) { sqlite3_result_double(context_, number); }
 

@@ -16,6 +16,8 @@ class SqliteCell {
 
   void set(std::int64_t number);
   void set(double number);
+  // kNoUser becomes a null.
+  void setUser(std::uint32_t user);
   // Not copied: valid UTF-8 that stays valid until the statement is reset.
   void set(std::string_view text);
   // Not copied either.

@@ -63,46 +63,48 @@ std::size_t StoreBatch::bytesOf(const RtcMessageRow& /*row*/, const StoreRowText
   return sizeof(RtcMessage) + text.view().size();
 }
 
-void StoreBatch::add(const AnalyticsRow& row, const StoreRowText& text) {
-  analytics_.push_back({row.recordedAt, indexOf(row.names), append(text.view()), {}});
+void StoreBatch::add(const AnalyticsRow& row, const StoreRowText& text, const StoreRowOwner& owner) {
+  analytics_.push_back({row.recordedAt, indexOf(row.names), owner.user, append(text.view()), {}});
   shareable_ = text.view().size() <= kMaxSharedTextBytes ? row.payload : ValueMap();
   count(bytesOf(row, text));
 }
 
-void StoreBatch::add(const MetricRow& row, const StoreRowText& text) {
-  metrics_.push_back({row.postedAt, row.identifier, append(text.view())});
+void StoreBatch::add(const MetricRow& row, const StoreRowText& text, const StoreRowOwner& owner) {
+  metrics_.push_back({row.postedAt, row.identifier, owner.user, append(text.view())});
   count(bytesOf(row, text));
 }
 
-void StoreBatch::add(const PowerRow& row, const StoreRowText& text) {
+void StoreBatch::add(const PowerRow& row, const StoreRowText& text, const StoreRowOwner& owner) {
   const Part both = append(text.view());
   const std::size_t name = row.name.size();
-  power_.push_back({row.recordedAt, row.group, {both.begin, name}, {both.begin + name, both.size - name}});
+  power_.push_back(
+      {row.recordedAt, row.group, {both.begin, name}, {both.begin + name, both.size - name}, owner.user});
   count(bytesOf(row, text));
 }
 
-void StoreBatch::add(const RtcSessionRow& row, const StoreRowText& text) {
-  indexOf(row.session);
+void StoreBatch::add(const RtcSessionRow& row, const StoreRowText& text, const StoreRowOwner& owner) {
+  indexOf(row.session, owner.user);
   count(bytesOf(row, text));
 }
 
-void StoreBatch::add(const RtcMessageRow& row, const StoreRowText& text) {
-  rtcMessages_.push_back(
-      {row.sentAt, indexOf(row.session), row.category, row.type, append(text.view()), analytics_.size()});
+void StoreBatch::add(const RtcMessageRow& row, const StoreRowText& text, const StoreRowOwner& owner) {
+  rtcMessages_.push_back({row.sentAt, indexOf(row.session, owner.user), row.category, row.type, owner.user,
+                          append(text.view()), analytics_.size()});
   shareable_ = {};
   count(bytesOf(row, text));
 }
 
-bool StoreBatch::share(const RtcMessageRow& row) {
+bool StoreBatch::share(const RtcMessageRow& row, std::uint32_t user) {
   // All empty maps share their storage.
   if (shareable_.empty() || !shareable_.sharesStorageWith(row.payload)) return false;
   Analytics& event = analytics_.back();
+  if (event.user != user) return false;
   const double later = row.sentAt - event.recordedAt;
   if (later < 0.0 || later > kSameMomentSeconds) return false;
   std::optional<JsonCut> cut(std::in_place);
   if (!row.hidden.empty()) cut = cutOfEntry(text(event.payload), row.payload, row.hidden);
   if (!cut || cut->size > kMaxHiddenBytes) return false;
-  event.rtc = Shared{indexOf(row.session), row.category, row.type, *cut};
+  event.rtc = Shared{indexOf(row.session, user), row.category, row.type, *cut};
   shareable_ = {};
   return true;
 }
@@ -115,6 +117,7 @@ void StoreBatch::clear() {
   names_.clear();
   nameSlots_.fill(0);
   sessions_.clear();
+  sessionUsers_.clear();
   text_.clear();
   if (text_.capacity() > kKeptBytes) std::string().swap(text_);
   shareable_ = {};
@@ -133,7 +136,7 @@ void StoreBatch::count(std::size_t bytes) {
   bytes_ += bytes;
 }
 
-std::size_t StoreBatch::indexOf(const EventNames& names) {
+std::uint32_t StoreBatch::indexOf(const EventNames& names) {
   std::uint32_t& slot = nameSlots_[EventNamesHash{}(names) % kNameSlots];
   if (slot == 0 || names_[slot - 1] != names) {
     names_.push_back(names);
@@ -142,7 +145,7 @@ std::size_t StoreBatch::indexOf(const EventNames& names) {
   return slot - 1;
 }
 
-std::size_t StoreBatch::indexOf(const std::shared_ptr<RtcSessionRecord>& session) {
+std::size_t StoreBatch::indexOf(const std::shared_ptr<RtcSessionRecord>& session, std::uint32_t user) {
   // Messages of few sessions take turns.
   constexpr std::size_t kCompared = 16;
   const std::size_t end = sessions_.size() > kCompared ? sessions_.size() - kCompared : 0;
@@ -150,6 +153,7 @@ std::size_t StoreBatch::indexOf(const std::shared_ptr<RtcSessionRecord>& session
     if (sessions_[at - 1] == session) return at - 1;
   }
   sessions_.push_back(session);
+  sessionUsers_.push_back(user);
   return sessions_.size() - 1;
 }
 

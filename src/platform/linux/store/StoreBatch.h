@@ -13,8 +13,14 @@
 
 #include "platform/linux/store/JsonCut.h"
 #include "platform/linux/store/StoreRow.h"
+#include "protocol/RequestSet.h"
 
 namespace tonewerk {
+
+// Whose row it is. kNoUser stands for the daemon itself, and for users that are not known.
+struct StoreRowOwner {
+  std::uint32_t user = kNoUser;
+};
 
 // The text that a batch keeps of one row: its payload as JSON, after a name that is the row's own. It is made
 // before the row is added, so that no lock is held meanwhile and its size is known.
@@ -68,13 +74,15 @@ class StoreBatch {
   };
   struct Analytics {
     double recordedAt = 0.0;
-    std::size_t names = 0;  // index in names()
+    std::uint32_t names = 0;  // index in names()
+    std::uint32_t user = kNoUser;
     Part payload;
     std::optional<Shared> rtc;
   };
   struct Metric {
     double postedAt = 0.0;
     std::uint32_t identifier = 0;
+    std::uint32_t user = kNoUser;
     Part record;
   };
   struct Power {
@@ -82,12 +90,14 @@ class StoreBatch {
     std::int64_t group = 0;
     Part name;
     Part payload;
+    std::uint32_t user = kNoUser;
   };
   struct RtcMessage {
     double sentAt = 0.0;
     std::size_t session = 0;  // index in sessions()
     std::uint16_t category = 0;
     std::uint16_t type = 0;
+    std::uint32_t user = kNoUser;
     Part payload;
     std::size_t eventsBefore = 0;  // the number of analytics rows that were added before it
   };
@@ -99,17 +109,17 @@ class StoreBatch {
   static std::size_t bytesOf(const RtcSessionRow& row, const StoreRowText& text);
   static std::size_t bytesOf(const RtcMessageRow& row, const StoreRowText& text);
 
-  void add(const AnalyticsRow& row, const StoreRowText& text);
-  void add(const MetricRow& row, const StoreRowText& text);
-  void add(const PowerRow& row, const StoreRowText& text);
-  void add(const RtcSessionRow& row, const StoreRowText& text);
-  void add(const RtcMessageRow& row, const StoreRowText& text);
+  void add(const AnalyticsRow& row, const StoreRowText& text, const StoreRowOwner& owner = {});
+  void add(const MetricRow& row, const StoreRowText& text, const StoreRowOwner& owner = {});
+  void add(const PowerRow& row, const StoreRowText& text, const StoreRowOwner& owner = {});
+  void add(const RtcSessionRow& row, const StoreRowText& text, const StoreRowOwner& owner = {});
+  void add(const RtcMessageRow& row, const StoreRowText& text, const StoreRowOwner& owner = {});
 
   // Makes the newest row, of the analytics events and the real-time-communication messages, a row of both.
-  // True when it is an event with the payload of `row`, recorded at most kSameMomentSeconds before, and its
-  // text has at most kMaxSharedTextBytes. Otherwise nothing has changed, and `row` is to be added. The batch
-  // counts no more rows and bytes than before.
-  [[nodiscard]] bool share(const RtcMessageRow& row);
+  // True when it is an event of the same user with the payload of `row`, recorded at most kSameMomentSeconds
+  // before, and its text has at most kMaxSharedTextBytes. Otherwise nothing has changed, and `row` is to be
+  // added. The batch counts no more rows and bytes than before.
+  [[nodiscard]] bool share(const RtcMessageRow& row, std::uint32_t user = kNoUser);
   // From now on no row that is there is shared. Call it when the batch gets no more rows: a payload that is
   // kept for sharing takes memory of its client.
   void endSharing() { shareable_ = {}; }
@@ -138,6 +148,8 @@ class StoreBatch {
   // The sessions of session rows and message rows, in the order of recording. One may be there more than
   // once.
   std::span<const std::shared_ptr<RtcSessionRecord>> sessions() const { return sessions_; }
+  // The user of each of them: that of the first row in the batch that named the session.
+  std::span<const std::uint32_t> sessionUsers() const { return sessionUsers_; }
   // Valid until the next add() or clear().
   std::string_view text(Part part) const { return std::string_view(text_).substr(part.begin, part.size); }
 
@@ -147,8 +159,8 @@ class StoreBatch {
 
   Part append(std::string_view text);
   void count(std::size_t bytes);
-  std::size_t indexOf(const EventNames& names);
-  std::size_t indexOf(const std::shared_ptr<RtcSessionRecord>& session);
+  std::uint32_t indexOf(const EventNames& names);
+  std::size_t indexOf(const std::shared_ptr<RtcSessionRecord>& session, std::uint32_t user);
 
   std::vector<Analytics> analytics_;
   std::vector<Metric> metrics_;
@@ -157,6 +169,7 @@ class StoreBatch {
   std::vector<EventNames> names_;
   std::array<std::uint32_t, kNameSlots> nameSlots_{};  // index in names_ plus 1, or 0
   std::vector<std::shared_ptr<RtcSessionRecord>> sessions_;
+  std::vector<std::uint32_t> sessionUsers_;
   std::string text_;
   // The payload of the last analytics row, while that row can be shared. Empty otherwise. Holding it keeps
   // its storage from being written, or used again for another message.

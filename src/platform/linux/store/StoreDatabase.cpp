@@ -80,6 +80,7 @@ StoreDatabase::Result StoreDatabase::open() {
   }
   if (*version == 0 && !prepareFile()) return fail();
   if (*version == 1 && !database_.run(storeMigration())) return fail();
+  if (*version == kStoreSchemaVersion && !addUserColumns()) return fail();
   // With this a commit costs no sync; each checkpoint makes one. A power cut loses the newest rows.
   if (!database_.run("PRAGMA journal_mode = WAL; PRAGMA synchronous = NORMAL")) return fail();
   applyBounds();
@@ -102,6 +103,13 @@ bool StoreDatabase::prepareFile() {
   return database_.run(
              "PRAGMA page_size = 8192; PRAGMA auto_vacuum = INCREMENTAL; PRAGMA journal_mode = WAL;") &&
          database_.run(storeSchema());
+}
+
+bool StoreDatabase::addUserColumns() {
+  const std::optional<std::int64_t> columns =
+      database_.number("SELECT count(*) FROM pragma_table_info('analytics_row') WHERE name = 'user_id'");
+  if (!columns) return false;
+  return *columns > 0 || database_.run(storeUserColumns());
 }
 
 void StoreDatabase::applyBounds() {

@@ -51,6 +51,8 @@ class StoreDatabase {
  private:
   [[nodiscard]] Result open();
   [[nodiscard]] bool prepareFile();
+  // When they are missing, since an earlier daemon made the file.
+  [[nodiscard]] bool addUserColumns();
   [[nodiscard]] bool insert(const StoreBatch& batch);
   void applyBounds();
   [[nodiscard]] Result resultOf(StoreTrimmer::Outcome outcome, bool& moreToDo);

@@ -5,9 +5,9 @@
 
 namespace tonewerk {
 
-bool StoreQueue::isShared(const RtcMessageRow& row) {
+bool StoreQueue::isShared(const RtcMessageRow& row, const StoreRowOwner& owner) {
   const MutexLock lock(mutex_);
-  return filling_.share(row);
+  return filling_.share(row, owner.user);
 }
 
 bool StoreQueue::waitForRoom(MutexLock& lock, std::size_t bytes, bool& hasTimedOut) {

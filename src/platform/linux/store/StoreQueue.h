@@ -6,6 +6,7 @@
 #include <cstdint>
 #include <deque>
 
+#include "platform/accounts/WorkingFor.h"
 #include "platform/linux/store/StoreBatch.h"
 #include "values/Mutex.h"
 
@@ -40,17 +41,19 @@ class StoreQueue {
 
   explicit StoreQueue(const Limits& limits) : limits_(limits) {}
 
-  // Any thread. `row` is of any type that StoreBatch takes. True when this row waited for the whole hold
-  // time, so that from now on rows are dropped.
+  // Any thread. `row` is of any type that StoreBatch takes, and belongs to the user for whom the thread works
+  // (WorkingFor). True when this row waited for the whole hold time, so that from now on rows are dropped.
   template <typename Row>
   [[nodiscard]] bool add(const Row& row) {
-    if (isShared(row)) return false;
+    const Account* const account = WorkingFor::accountIfAny();
+    const StoreRowOwner owner{account == nullptr ? kNoUser : account->user()};
+    if (isShared(row, owner)) return false;
     const StoreRowText text(row);  // the JSON is made without the lock
     const std::size_t bytes = StoreBatch::bytesOf(row, text);
     MutexLock lock(mutex_);
     bool hasTimedOut = false;
     if (waitForRoom(lock, bytes, hasTimedOut)) {
-      batchWithRoom().add(row, text);
+      batchWithRoom().add(row, text, owner);
       countAdded(bytes);
     }
     return hasTimedOut;
@@ -88,9 +91,9 @@ class StoreQueue {
 
  private:
   // Whether the row has become part of one that is in the queue already, and so takes no room.
-  [[nodiscard]] bool isShared(const RtcMessageRow& row);
+  [[nodiscard]] bool isShared(const RtcMessageRow& row, const StoreRowOwner& owner);
   template <typename Row>
-  [[nodiscard]] bool isShared(const Row& /*row*/) {
+  [[nodiscard]] bool isShared(const Row& /*row*/, const StoreRowOwner& /*owner*/) {
     return false;
   }
   // False when the row is dropped. `hasTimedOut` is set when it waited for the whole hold time.

@@ -10,22 +10,24 @@ namespace {
 constexpr std::string_view kTables = R"(
   CREATE TABLE analytics_row (
     id INTEGER PRIMARY KEY, recorded_at REAL NOT NULL, name_set INTEGER NOT NULL, payload TEXT NOT NULL,
-    rtc_session INTEGER, rtc_bits INTEGER);
+    rtc_session INTEGER, rtc_bits INTEGER, user_id INTEGER);
   CREATE TABLE analytics_name (
     name_set INTEGER NOT NULL, position INTEGER NOT NULL, name TEXT NOT NULL,
     PRIMARY KEY (name_set, position)) WITHOUT ROWID;
   CREATE INDEX analytics_name_by_name ON analytics_name (name);
   CREATE TABLE metric (
-    id INTEGER PRIMARY KEY, posted_at REAL NOT NULL, identifier INTEGER NOT NULL, record BLOB NOT NULL);
+    id INTEGER PRIMARY KEY, posted_at REAL NOT NULL, identifier INTEGER NOT NULL, record BLOB NOT NULL,
+    user_id INTEGER);
   CREATE TABLE power_event (
     id INTEGER PRIMARY KEY, recorded_at REAL NOT NULL, event_group INTEGER NOT NULL, name TEXT NOT NULL,
-    payload TEXT NOT NULL);
+    payload TEXT NOT NULL, user_id INTEGER);
   CREATE TABLE rtc_session (
     id INTEGER PRIMARY KEY, started_at REAL NOT NULL, session_info TEXT NOT NULL,
-    user_info TEXT NOT NULL);
+    user_info TEXT NOT NULL, user_id INTEGER);
   CREATE TABLE rtc_row (
     id INTEGER PRIMARY KEY, sent_at REAL NOT NULL, rtc_session INTEGER NOT NULL,
-    category INTEGER NOT NULL, type INTEGER NOT NULL, payload TEXT NOT NULL);
+    category INTEGER NOT NULL, type INTEGER NOT NULL, payload TEXT NOT NULL,
+    user_id INTEGER);
 )";
 
 // CROSS JOIN keeps the rows outermost. So events come in the order of their identifiers and are not sorted.
@@ -58,6 +60,14 @@ constexpr std::string_view kFromVersion1 = R"(
   ALTER TABLE rtc_message RENAME TO rtc_row;
 )";
 
+std::string userColumns() {
+  std::string sql;
+  for (const StoreTable& table : kStoreTables) {
+    sql.append("ALTER TABLE ").append(table.name).append(" ADD COLUMN user_id INTEGER;");
+  }
+  return sql;
+}
+
 std::string inTransaction(const std::string& sql) {
   return "BEGIN IMMEDIATE;" + sql + "PRAGMA user_version = " + std::to_string(kStoreSchemaVersion) +
          "; COMMIT;";
@@ -74,8 +84,11 @@ std::string storeSchema() {
 
 std::string storeMigration() {
   std::string sql(kFromVersion1);
+  sql += userColumns();
   sql += kRtcView;
   return inTransaction(sql);
 }
+
+std::string storeUserColumns() { return inTransaction(userColumns()); }
 
 }  // namespace tonewerk

@@ -56,4 +56,8 @@ std::string storeSchema();
 // pages. In version 1 rtc_message was a table, and analytics_row had no columns for messages.
 std::string storeMigration();
 
+// The SQL that gives the tables of an earlier file of this version the column with the user, in one
+// transaction that writes few pages. Programs that do not know the column can read and write the file.
+std::string storeUserColumns();
+
 }  // namespace tonewerk

@@ -14,6 +14,8 @@
 #include <vector>
 
 #include "platform/Log.h"
+#include "platform/accounts/Accounts.h"
+#include "platform/accounts/WorkingFor.h"
 #include "platform/linux/store/FullDisk.h"
 #include "support/TemporaryDirectory.h"
 #include "support/manual/ManualClock.h"
@@ -34,6 +36,7 @@ using testing::SizeIs;
 
 constexpr seconds kLongEnough{30};
 constexpr double kDay = 86'400.0;
+constexpr std::uint32_t kOwner = 990;
 
 struct Event {
   std::int64_t id;
@@ -96,6 +99,7 @@ class ReportStoreTest : public testing::Test {
   LogCategory category_{log_, "com.orvane.tonewerk", "twrs"};
   MemoryJsonService json_;
   MemoryPreferenceStore preferences_;
+  Accounts accounts_{kOwner, clock_};
   std::unique_ptr<ReportStore> store_;
 };
 
@@ -243,6 +247,40 @@ TEST_F(ReportStoreTest, MakesTheWholeSchema) {
       number(
           "SELECT count(*) FROM (SELECT id, sent_at, rtc_session, category, type, payload FROM rtc_message)"),
       0);
+}
+
+TEST_F(ReportStoreTest, EachRowHasTheUserForWhomTheThreadWorked) {
+  open();
+  const auto session = std::make_shared<RtcSessionRecord>();
+  const auto recordOneOfEach = [&] {
+    record("com.orvane.n", {{"n", 1}});
+    store_->record(MetricRow{clock_.now(), 1, "record"});
+    recordPower(1);
+    store_->record(RtcMessageRow{clock_.now(), session, 4, 1, {{"n", 2}}});
+  };
+  {
+    const std::shared_ptr<Account> account = accounts_.of(1001);
+    const WorkingFor scope(account);
+    store_->record(RtcSessionRow{session});
+    recordOneOfEach();
+  }
+  recordOneOfEach();
+  ASSERT_TRUE(flush());
+  for (const char* table : {"analytics_row", "metric", "power_event", "rtc_row"}) {
+    const std::string from = " FROM " + std::string(table);
+    EXPECT_EQ(number("SELECT count(*)" + from), 2) << table;
+    EXPECT_EQ(number("SELECT user_id" + from + " WHERE id = 1"), 1001) << table;
+    EXPECT_EQ(number("SELECT user_id IS NULL" + from + " WHERE id = 2"), 1) << table;
+  }
+  EXPECT_EQ(number("SELECT user_id FROM rtc_session"), 1001);
+}
+
+TEST_F(ReportStoreTest, TheUserIsInNoView) {
+  open();
+  recordNumbered(1);
+  ASSERT_TRUE(flush());
+  EXPECT_EQ(number("SELECT count(*) FROM pragma_table_info('analytics_event')"), 4);
+  EXPECT_EQ(number("SELECT count(*) FROM pragma_table_info('rtc_message')"), 6);
 }
 
 TEST_F(ReportStoreTest, TakesEventsFromManyThreads) {

@@ -9,6 +9,8 @@
 #include <vector>
 
 #include "platform/Log.h"
+#include "platform/accounts/Accounts.h"
+#include "platform/accounts/WorkingFor.h"
 #include "platform/linux/otlp/HttpClient.h"
 #include "platform/linux/otlp/LinuxLinkReport.h"
 #include "platform/linux/store/ReportStore.h"
@@ -81,6 +83,7 @@ class SharedRowTest : public testing::Test {
   MemoryPreferenceStore preferences_;
   ManualClock clock_;
   const std::shared_ptr<RtcSessionRecord> session_ = std::make_shared<RtcSessionRecord>();
+  Accounts accounts_{990, clock_};
   std::unique_ptr<ReportStore> store_;
 };
 
@@ -95,6 +98,24 @@ TEST_F(SharedRowTest, BothViewsShowTheRow) {
   EXPECT_EQ(number("SELECT count(*) FROM analytics_row"), "1");
   EXPECT_EQ(number("SELECT count(*) FROM rtc_row"), "0");
   EXPECT_EQ(number("SELECT count(*) FROM rtc_session"), "1");
+}
+
+TEST_F(SharedRowTest, AnEventAndAMessageOfTwoUsersHaveRowsOfTheirOwn) {
+  const ValueMap payload{{"a", 1}};
+  const std::shared_ptr<Account> first = accounts_.of(1001);
+  const std::shared_ptr<Account> second = accounts_.of(1002);
+  {
+    const WorkingFor scope(first);
+    recordBoth(payload);
+    recordEvent(payload);
+  }
+  {
+    const WorkingFor scope(second);
+    recordMessage(payload);
+  }
+  EXPECT_THAT(rows("SELECT user_id, rtc_session FROM analytics_row ORDER BY id", 2),
+              ElementsAre("1001 1", "1001 "));
+  EXPECT_THAT(rows("SELECT user_id FROM rtc_row"), ElementsAre("1002"));
 }
 
 TEST_F(SharedRowTest, TheMessageHasNoHiddenEntryWhereverItIs) {

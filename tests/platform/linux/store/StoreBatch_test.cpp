@@ -231,6 +231,14 @@ TEST_F(SharingBatchTest, AMessageSharesTheRowOfTheEventBeforeIt) {
   EXPECT_EQ(batch_.bytes(), bytes + metricBytes);
 }
 
+TEST_F(SharingBatchTest, ARowIsSharedOnlyWithAMessageOfItsUser) {
+  const AnalyticsRow event{5.0, "a", payload_};
+  batch_.add(event, StoreRowText(event), {.user = 1001});
+  EXPECT_FALSE(batch_.share(messageOf(payload_)));
+  EXPECT_FALSE(batch_.share(messageOf(payload_), 1002));
+  EXPECT_TRUE(batch_.share(messageOf(payload_), 1001));
+}
+
 TEST_F(SharingBatchTest, ARowIsSharedOnce) {
   addEvent(payload_);
   EXPECT_TRUE(batch_.share(messageOf(payload_)));

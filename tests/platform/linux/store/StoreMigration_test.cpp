@@ -58,11 +58,62 @@ constexpr const char* kVersion1 = R"(
   COMMIT;
 )";
 
-class StoreMigrationTest : public testing::Test {
+// A file as daemons made it before they recorded the users of rows, with some rows.
+constexpr const char* kWithoutUsers = R"(
+  PRAGMA page_size = 8192; PRAGMA auto_vacuum = INCREMENTAL; PRAGMA journal_mode = WAL;
+  BEGIN;
+  CREATE TABLE analytics_row (
+    id INTEGER PRIMARY KEY, recorded_at REAL NOT NULL, name_set INTEGER NOT NULL, payload TEXT NOT NULL,
+    rtc_session INTEGER, rtc_bits INTEGER);
+  CREATE TABLE analytics_name (
+    name_set INTEGER NOT NULL, position INTEGER NOT NULL, name TEXT NOT NULL,
+    PRIMARY KEY (name_set, position)) WITHOUT ROWID;
+  CREATE INDEX analytics_name_by_name ON analytics_name (name);
+  CREATE TABLE metric (
+    id INTEGER PRIMARY KEY, posted_at REAL NOT NULL, identifier INTEGER NOT NULL, record BLOB NOT NULL);
+  CREATE TABLE power_event (
+    id INTEGER PRIMARY KEY, recorded_at REAL NOT NULL, event_group INTEGER NOT NULL, name TEXT NOT NULL,
+    payload TEXT NOT NULL);
+  CREATE TABLE rtc_session (
+    id INTEGER PRIMARY KEY, started_at REAL NOT NULL, session_info TEXT NOT NULL,
+    user_info TEXT NOT NULL);
+  CREATE TABLE rtc_row (
+    id INTEGER PRIMARY KEY, sent_at REAL NOT NULL, rtc_session INTEGER NOT NULL,
+    category INTEGER NOT NULL, type INTEGER NOT NULL, payload TEXT NOT NULL);
+  CREATE VIEW analytics_event (id, recorded_at, name, payload) AS
+    SELECT r.id * 2 + n.position, r.recorded_at, n.name, r.payload
+      FROM analytics_row AS r CROSS JOIN analytics_name AS n ON n.name_set = r.name_set;
+  CREATE VIEW rtc_message (id, sent_at, rtc_session, category, type, payload) AS
+    SELECT id, sent_at, rtc_session, category, type, payload FROM rtc_row
+    UNION ALL
+    SELECT id, recorded_at, rtc_session, CAST(rtc_bits >> 16 & 65535 AS INTEGER),
+           CAST(rtc_bits & 65535 AS INTEGER),
+           CAST(CASE WHEN rtc_bits >> 32 = 0 THEN payload
+                     ELSE substr(CAST(payload AS BLOB), 1, rtc_bits >> 40) ||
+                          substr(CAST(payload AS BLOB), (rtc_bits >> 40) + (rtc_bits >> 32 & 255) + 1)
+                     END AS TEXT)
+      FROM analytics_row WHERE rtc_session IS NOT NULL;
+  INSERT INTO analytics_name VALUES (1, 0, 'first'), (1, 1, 'second'), (2, 0, 'single');
+  INSERT INTO analytics_row VALUES
+    (10, 1.5, 1, '{"n":1}', NULL, NULL), (12, 2.5, 2, '{"n":2}', 5, 4 << 16 | 1);
+  INSERT INTO metric VALUES (3, 1.5, 7, x'00ff');
+  INSERT INTO power_event VALUES (4, 1.5, 28, 'power', '{"p":1}');
+  INSERT INTO rtc_session VALUES (5, 1.5, '{"s":1}', '{"kLinkReportUserInfoServiceName":"telephony_session"}');
+  INSERT INTO rtc_row VALUES (11, 1.5, 5, 4, 1, '{"m":1}');
+  PRAGMA user_version = 2;
+  COMMIT;
+)";
+
+// The tables and views with their columns.
+constexpr const char* kColumns =
+    "SELECT m.type, m.name, c.name, c.type, c.\"notnull\", c.pk FROM sqlite_master AS m"
+    " JOIN pragma_table_info(m.name) AS c ORDER BY m.name, c.cid";
+
+class OldFileTest : public testing::Test {
  protected:
-  StoreMigrationTest() {
+  explicit OldFileTest(const char* contents) {
     EXPECT_TRUE(file_.open(path(), SqliteDatabase::Mode::kReadWrite, kLongEnough));
-    EXPECT_TRUE(file_.run(kVersion1)) << file_.problem();
+    EXPECT_TRUE(file_.run(contents)) << file_.problem();
   }
   std::string path() const { return directory_.path("reports.db"); }
 
@@ -97,6 +148,16 @@ class StoreMigrationTest : public testing::Test {
   StoreDatabase store_{directory_.path(), json_};
 };
 
+class StoreMigrationTest : public OldFileTest {
+ protected:
+  StoreMigrationTest() : OldFileTest(kVersion1) {}
+};
+
+class FileWithoutUsersTest : public OldFileTest {
+ protected:
+  FileWithoutUsersTest() : OldFileTest(kWithoutUsers) {}
+};
+
 TEST_F(StoreMigrationTest, KeepsAllRowsAndTheirIdentifiers) {
   const std::vector<std::string> before = contents();
   ASSERT_THAT(before, SizeIs(8));
@@ -127,13 +188,45 @@ TEST_F(StoreMigrationTest, MakesTheTablesOfANewFile) {
   const TemporaryDirectory directory;
   StoreDatabase made(directory.path(), json_);
   EXPECT_EQ(made.write({}), StoreDatabase::Result::kDone);
-  const std::string query =
-      "SELECT m.type, m.name, c.name, c.type, c.\"notnull\", c.pk FROM sqlite_master AS m"
-      " JOIN pragma_table_info(m.name) AS c ORDER BY m.name, c.cid";
-  const std::vector<std::string> migrated = rows(query, 6);
+  const std::vector<std::string> migrated = rows(kColumns, 6);
   ASSERT_TRUE(file_.open(directory.path("reports.db"), SqliteDatabase::Mode::kReadOnly, kLongEnough));
-  EXPECT_EQ(migrated, rows(query, 6));
+  EXPECT_EQ(migrated, rows(kColumns, 6));
   EXPECT_THAT(migrated, Contains(HasSubstr("view rtc_message payload")));
+}
+
+TEST_F(FileWithoutUsersTest, KeepsItsRowsAndItsViewsAndGetsTheColumnsOfANewFile) {
+  const std::vector<std::string> before = contents();
+  ASSERT_THAT(before, SizeIs(8));
+  EXPECT_EQ(write(), StoreDatabase::Result::kDone);
+  EXPECT_EQ(contents(), before);
+  EXPECT_EQ(version(), 2);
+  const std::vector<std::string> columns = rows(kColumns, 6);
+  EXPECT_THAT(columns, Contains("table analytics_row user_id INTEGER 0 0"));
+  const TemporaryDirectory directory;
+  StoreDatabase made(directory.path(), json_);
+  EXPECT_EQ(made.write({}), StoreDatabase::Result::kDone);
+  ASSERT_TRUE(file_.open(directory.path("reports.db"), SqliteDatabase::Mode::kReadOnly, kLongEnough));
+  EXPECT_EQ(columns, rows(kColumns, 6));
+}
+
+TEST_F(FileWithoutUsersTest, ItsRowsHaveNoUserAndNewOnesHave) {
+  const MetricRow row{4.5, 7, "m"};
+  StoreBatch batch;
+  batch.add(row, StoreRowText(row), {.user = 1001});
+  EXPECT_EQ(store_.write(batch), StoreDatabase::Result::kDone);
+  EXPECT_THAT(rows("SELECT id, coalesce(user_id, 'none') FROM metric ORDER BY id", 2),
+              ElementsAre("3 none", "4 1001"));
+  EXPECT_THAT(rows("SELECT count(user_id) FROM analytics_row"), ElementsAre("0"));
+}
+
+TEST_F(FileWithoutUsersTest, AFailureInTheMiddleLeavesItWithoutUsers) {
+  ASSERT_TRUE(file_.run("ALTER TABLE rtc_row ADD COLUMN user_id INTEGER"));
+  EXPECT_EQ(write(), StoreDatabase::Result::kFailed);
+  EXPECT_EQ(file_.number("SELECT count(*) FROM pragma_table_info('analytics_row')"), 6);
+
+  ASSERT_TRUE(file_.run("ALTER TABLE rtc_row DROP COLUMN user_id"));
+  EXPECT_EQ(write(), StoreDatabase::Result::kDone);
+  EXPECT_EQ(file_.number("SELECT count(*) FROM pragma_table_info('analytics_row')"), 7);
 }
 
 // A crash leaves a transaction without its end, as a failure does.
