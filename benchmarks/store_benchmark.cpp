@@ -15,6 +15,7 @@
 
 #include "platform/Clock.h"
 #include "platform/Log.h"
+#include "platform/accounts/Accounts.h"
 #include "platform/linux/store/ReportStore.h"
 #include "platform/linux/store/StoreMetricon.h"
 #include "support/TemporaryDirectory.h"
@@ -53,7 +54,8 @@ class Store {
   RunningClock clock;
   MemoryJsonService json;
   MemoryPreferenceStore preferences;
-  ReportStore store{directory.path(), json, preferences, clock, category};
+  Accounts accounts{990, clock};
+  ReportStore store{directory.path(), json, preferences, clock, accounts, category};
   StoreMetricon metricon{store, preferences, clock, category};
 };
 

@@ -97,7 +97,7 @@ class Daemon {
         linux_(linux),
         runtimeDirectory_(directories.runtime),
         log_(log),
-        store_(directories.state, linux.json(), linux.preferences(), linux.clock(), log),
+        store_(directories.state, linux.json(), linux.preferences(), linux.clock(), linux.accounts(), log),
         metricon_(store_, linux.preferences(), linux.clock(), log),
         energybook_(store_, linux.clock()),
         diagwire_(store_, linux.clock()),

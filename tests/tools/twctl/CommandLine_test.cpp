@@ -10,6 +10,7 @@
 #include <utility>
 #include <vector>
 
+#include "platform/accounts/Accounts.h"
 #include "platform/linux/descriptors/FileDescriptor.h"
 #include "platform/linux/descriptors/UnixAddress.h"
 #include "platform/linux/json/NlohmannJsonService.h"
@@ -371,7 +372,8 @@ class EventsCommandTest : public CommandLineTest {
     const LogCategory category(log, "com.orvane.tonewerk", "twrs");
     const MemoryPreferenceStore preferences;
     ManualClock clock;
-    ReportStore store(directory_.path("state"), json_, preferences, clock, category);
+    Accounts accounts(990, clock);
+    ReportStore store(directory_.path("state"), json_, preferences, clock, accounts, category);
     store.recordEvent(1'763'633'880.0, "com.orvane.a", {{"n", 1}});
     store.recordEvent(1'763'633'890.5, "com.orvane.b", {{"n", 2}});
     store.recordEvent(1'763'633'900.0, "com.orvane.a", {{"n", 3}});
@@ -417,7 +419,8 @@ class MetricsCommandTest : public CommandLineTest {
     const LogCategory category(log, "com.orvane.tonewerk", "twrs");
     const MemoryPreferenceStore preferences;
     ManualClock clock;
-    ReportStore store(directory_.path("state"), json_, preferences, clock, category);
+    Accounts accounts(990, clock);
+    ReportStore store(directory_.path("state"), json_, preferences, clock, accounts, category);
     const auto record = [&](double second, std::uint32_t identifier, std::string bytes) {
       store.record(MetricRow{1'763'633'880.0 + second, identifier, std::move(bytes)});
     };
@@ -468,7 +471,8 @@ class PowerCommandTest : public CommandLineTest {
     const LogCategory category(log, "com.orvane.tonewerk", "twrs");
     const MemoryPreferenceStore preferences;
     ManualClock clock;
-    ReportStore store(directory_.path("state"), json_, preferences, clock, category);
+    Accounts accounts(990, clock);
+    ReportStore store(directory_.path("state"), json_, preferences, clock, accounts, category);
     store.recordEvent(1'763'633'880.0, "com.orvane.a", {{"EngineOnDuration", 100}});
     const auto record = [&](double second, const char* name, ValueMap payload) {
       store.record(PowerRow{1'763'633'880.0 + second, 28, name, std::move(payload)});

@@ -9,6 +9,7 @@
 #include "platform/Clock.h"
 #include "platform/Log.h"
 #include "platform/PreferenceStore.h"
+#include "platform/accounts/Accounts.h"
 #include "values/GrowingDelay.h"
 
 namespace tonewerk {
@@ -27,14 +28,16 @@ bool isNumber(const Value& value) {
 }  // namespace
 
 ReportStore::ReportStore(const std::string& directory, const JsonService& json,
-                         const PreferenceStore& preferences, const Clock& clock, const LogCategory& log,
-                         const Limits& limits)
+                         const PreferenceStore& preferences, const Clock& clock, Accounts& accounts,
+                         const LogCategory& log, const Limits& limits)
     : preferences_(preferences),
       clock_(clock),
       log_(log),
       queue_(limits),
       database_(directory, json),
-      thread_([this] { run(); }) {}
+      thread_([this] { run(); }) {
+  accounts.totals().setTotal(Resource::kSinkBytes, limits.bytes);
+}
 
 ReportStore::~ReportStore() {
   queue_.stop();

@@ -14,6 +14,7 @@
 
 namespace tonewerk {
 
+class Accounts;
 class Clock;
 class JsonService;
 class LogCategory;
@@ -28,6 +29,9 @@ class PreferenceStore;
 // wait: rows are kept while there is room and then dropped. Their number is logged when writing succeeds
 // again, and at the end. A damaged file is moved aside.
 //
+// A row belongs to the user for whom the recording thread works (WorkingFor). The user's account is charged for
+// the row's place in the queue; see StoreQueue.
+//
 // The bounds are the preferences "max_megabytes" (256) and "max_days" (30) of the domain
 // "com.orvane.tonewerk.store". They are read again every ten seconds while there is something to write, and
 // when readBoundsAgain() asks for it. Rows that are too old are deleted then.
@@ -39,9 +43,10 @@ class ReportStore {
 
   using Limits = StoreQueue::Limits;
 
-  // The file is in `directory`, which is made when it is missing. All references outlive the store.
+  // The file is in `directory`, which is made when it is missing. All references outlive the store. The total
+  // of Resource::kSinkBytes in `accounts` becomes that of `limits`.
   ReportStore(const std::string& directory, const JsonService& json, const PreferenceStore& preferences,
-              const Clock& clock, const LogCategory& log, const Limits& limits = {});
+              const Clock& clock, Accounts& accounts, const LogCategory& log, const Limits& limits = {});
   ReportStore(const ReportStore&) = delete;
   ReportStore& operator=(const ReportStore&) = delete;
   // Writes the rows that are left, and gives up when that fails. Logs how many rows are lost.

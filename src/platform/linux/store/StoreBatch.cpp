@@ -66,12 +66,12 @@ std::size_t StoreBatch::bytesOf(const RtcMessageRow& /*row*/, const StoreRowText
 void StoreBatch::add(const AnalyticsRow& row, const StoreRowText& text, const StoreRowOwner& owner) {
   analytics_.push_back({row.recordedAt, indexOf(row.names), owner.user, append(text.view()), {}});
   shareable_ = text.view().size() <= kMaxSharedTextBytes ? row.payload : ValueMap();
-  count(bytesOf(row, text));
+  count(bytesOf(row, text), owner);
 }
 
 void StoreBatch::add(const MetricRow& row, const StoreRowText& text, const StoreRowOwner& owner) {
   metrics_.push_back({row.postedAt, row.identifier, owner.user, append(text.view())});
-  count(bytesOf(row, text));
+  count(bytesOf(row, text), owner);
 }
 
 void StoreBatch::add(const PowerRow& row, const StoreRowText& text, const StoreRowOwner& owner) {
@@ -79,19 +79,19 @@ void StoreBatch::add(const PowerRow& row, const StoreRowText& text, const StoreR
   const std::size_t name = row.name.size();
   power_.push_back(
       {row.recordedAt, row.group, {both.begin, name}, {both.begin + name, both.size - name}, owner.user});
-  count(bytesOf(row, text));
+  count(bytesOf(row, text), owner);
 }
 
 void StoreBatch::add(const RtcSessionRow& row, const StoreRowText& text, const StoreRowOwner& owner) {
   indexOf(row.session, owner.user);
-  count(bytesOf(row, text));
+  count(bytesOf(row, text), owner);
 }
 
 void StoreBatch::add(const RtcMessageRow& row, const StoreRowText& text, const StoreRowOwner& owner) {
   rtcMessages_.push_back({row.sentAt, indexOf(row.session, owner.user), row.category, row.type, owner.user,
                           append(text.view()), analytics_.size()});
   shareable_ = {};
-  count(bytesOf(row, text));
+  count(bytesOf(row, text), owner);
 }
 
 bool StoreBatch::share(const RtcMessageRow& row, std::uint32_t user) {
@@ -123,6 +123,7 @@ void StoreBatch::clear() {
   shareable_ = {};
   rows_ = 0;
   bytes_ = 0;
+  charges_.clear();
 }
 
 StoreBatch::Part StoreBatch::append(std::string_view text) {
@@ -131,9 +132,10 @@ StoreBatch::Part StoreBatch::append(std::string_view text) {
   return {begin, text.size()};
 }
 
-void StoreBatch::count(std::size_t bytes) {
+void StoreBatch::count(std::size_t bytes, const StoreRowOwner& owner) {
   ++rows_;
   bytes_ += bytes;
+  if (owner.account != nullptr) charges_.add(*owner.account, owner.charge);
 }
 
 std::uint32_t StoreBatch::indexOf(const EventNames& names) {

@@ -12,6 +12,7 @@
 #include <vector>
 
 #include "platform/linux/store/JsonCut.h"
+#include "platform/linux/store/StoreCharges.h"
 #include "platform/linux/store/StoreRow.h"
 #include "protocol/RequestSet.h"
 
@@ -20,6 +21,9 @@ namespace tonewerk {
 // Whose row it is. kNoUser stands for the daemon itself, and for users that are not known.
 struct StoreRowOwner {
   std::uint32_t user = kNoUser;
+  // Who bears how many bytes for the row; null when nobody does.
+  Account* account = nullptr;
+  std::size_t charge = 0;
 };
 
 // The text that a batch keeps of one row: its payload as JSON, after a name that is the row's own. It is made
@@ -136,6 +140,8 @@ class StoreBatch {
   // Of all tables.
   std::size_t rows() const { return rows_; }
   std::size_t bytes() const { return bytes_; }
+  // What the owners of the rows bear for them.
+  const StoreCharges& charges() const { return charges_; }
   // The size of the buffer of the text.
   std::size_t textCapacity() const { return text_.capacity(); }
 
@@ -158,7 +164,7 @@ class StoreBatch {
   static constexpr std::size_t kNameSlots = 256;
 
   Part append(std::string_view text);
-  void count(std::size_t bytes);
+  void count(std::size_t bytes, const StoreRowOwner& owner);
   std::uint32_t indexOf(const EventNames& names);
   std::size_t indexOf(const std::shared_ptr<RtcSessionRecord>& session, std::uint32_t user);
 
@@ -176,6 +182,7 @@ class StoreBatch {
   ValueMap shareable_;
   std::size_t rows_ = 0;
   std::size_t bytes_ = 0;
+  StoreCharges charges_;
 };
 
 }  // namespace tonewerk

@@ -5,25 +5,52 @@
 
 namespace tonewerk {
 
+StoreQueue::~StoreQueue() {
+  StoreCharges givenBack;
+  {
+    const MutexLock lock(mutex_);
+    givenBack = beginDropping();
+  }
+  givenBack.give();
+}
+
 bool StoreQueue::isShared(const RtcMessageRow& row, const StoreRowOwner& owner) {
   const MutexLock lock(mutex_);
   return filling_.share(row, owner.user);
 }
 
-bool StoreQueue::waitForRoom(MutexLock& lock, std::size_t bytes, bool& hasTimedOut) {
-  if (!fits(bytes) && waitsForRoom_) {
-    const auto deadline = std::chrono::steady_clock::now() + limits_.hold;
-    while (!fits(bytes) && waitsForRoom_ && room_.waitUntil(lock, deadline)) {
-    }
-    hasTimedOut = !fits(bytes) && waitsForRoom_;
-    if (hasTimedOut) {
-      waitsForRoom_ = false;
-      room_.notifyAll();
-    }
+bool StoreQueue::waitForRoom(MutexLock& lock, std::size_t bytes) {
+  if (fits(bytes) || !waitsForRoom_) return false;
+  const auto deadline = std::chrono::steady_clock::now() + limits_.hold;
+  while (!fits(bytes) && waitsForRoom_ && room_.waitUntil(lock, deadline)) {
   }
-  if (fits(bytes)) return true;
+  return !fits(bytes) && waitsForRoom_;
+}
+
+StoreCharges StoreQueue::beginDropping() {
+  room_.notifyAll();
+  return std::exchange(waitsForRoom_, false) ? charges() : StoreCharges();
+}
+
+StoreCharges StoreQueue::charges() const {
+  StoreCharges sum = takenCharges_;
+  for (const StoreBatch& batch : full_) sum.add(batch.charges());
+  sum.add(filling_.charges());
+  return sum;
+}
+
+bool StoreQueue::isTaken(const StoreRowOwner& owner, std::size_t bytes) {
+  if (fits(bytes) && (waitsForRoom_ || isWithinHalf(owner))) return true;
   ++dropped_;
+  if (owner.account != nullptr) owner.account->countRefusal(Resource::kSinkBytes);
   return false;
+}
+
+// Asked only while rows are dropped, when nothing keeps the sum for each user.
+bool StoreQueue::isWithinHalf(const StoreRowOwner& owner) const {
+  if (owner.account == nullptr) return true;
+  const std::size_t queued = charges().of(*owner.account);
+  return queued == 0 || queued + owner.charge <= limits_.bytes / 2;
 }
 
 StoreBatch& StoreQueue::batchWithRoom() {
@@ -35,7 +62,8 @@ StoreBatch& StoreQueue::batchWithRoom() {
   return filling_;
 }
 
-void StoreQueue::countAdded(std::size_t bytes) {
+void StoreQueue::countAdded(std::size_t bytes, const StoreRowOwner& owner) {
+  if (waitsForRoom_ && owner.account != nullptr) owner.account->charge(Resource::kSinkBytes, owner.charge);
   const bool wasUrgent = isUrgent();
   ++queuedRows_;
   queuedBytes_ += bytes;
@@ -82,6 +110,7 @@ bool StoreQueue::take(StoreBatch& batch, bool wait) {
   }
   takenRows_ = batch.rows();
   takenBytes_ = batch.bytes();
+  takenCharges_ = batch.charges();
   queuedRows_ -= takenRows_;
   queuedBytes_ -= takenBytes_;
   leftOver_ = queuedRows_ > 0;
@@ -100,19 +129,30 @@ void StoreQueue::beginAttempt() {
 }
 
 void StoreQueue::committed() {
+  StoreCharges givenBack;
+  {
+    const MutexLock lock(mutex_);
+    std::swap(givenBack, takenCharges_);
+    if (!waitsForRoom_) givenBack.clear();
+  }
+  givenBack.give();
   const MutexLock lock(mutex_);
+  if (!std::exchange(waitsForRoom_, true)) charges().charge();
   committed_ += std::exchange(takenRows_, 0);
   takenBytes_ = 0;
-  waitsForRoom_ = true;
   room_.notifyAll();
   progress_.notifyAll();
 }
 
 void StoreQueue::failed() {
+  StoreCharges givenBack;
+  {
+    const MutexLock lock(mutex_);
+    givenBack = beginDropping();
+  }
+  givenBack.give();
   const MutexLock lock(mutex_);
   failedFlush_ = attemptedFlush_;
-  waitsForRoom_ = false;
-  room_.notifyAll();
   progress_.notifyAll();
 }
 

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <algorithm>
 #include <chrono>
 #include <cstddef>
 #include <cstdint>
@@ -24,7 +25,12 @@ namespace tonewerk {
 //
 // Rows count against the bounds until they are committed. While writing succeeds, add() waits for room. After
 // failed(), or when the writer makes no progress for the hold time, add() does not wait until the next
-// committed(): rows that do not fit are dropped and counted.
+// committed(): rows that do not fit are dropped and counted. Then the rows of one user also fit only into half
+// of the bytes, so that there is room for others' rows.
+//
+// While add() waits for room, the user of each row is charged for it (Resource::kSinkBytes). So whoever gives
+// work to the recording threads can let a user's work wait before it fills the queue and all others wait.
+// While rows are dropped nobody is charged: that work would wait for the disk.
 class StoreQueue {
  public:
   struct Limits {
@@ -40,22 +46,34 @@ class StoreQueue {
   };
 
   explicit StoreQueue(const Limits& limits) : limits_(limits) {}
+  StoreQueue(const StoreQueue&) = delete;
+  StoreQueue& operator=(const StoreQueue&) = delete;
+  // Gives back what is still charged.
+  ~StoreQueue();
 
-  // Any thread. `row` is of any type that StoreBatch takes, and belongs to the user for whom the thread works
+  // Any thread, which holds no lock, because other users' work may go on within the call. `row` is of any type that StoreBatch takes, and belongs to the user for whom the thread works
   // (WorkingFor). True when this row waited for the whole hold time, so that from now on rows are dropped.
   template <typename Row>
   [[nodiscard]] bool add(const Row& row) {
-    const Account* const account = WorkingFor::accountIfAny();
-    const StoreRowOwner owner{account == nullptr ? kNoUser : account->user()};
+    StoreRowOwner owner;
+    owner.account = WorkingFor::accountIfAny();
+    if (owner.account != nullptr) owner.user = owner.account->user();
     if (isShared(row, owner)) return false;
     const StoreRowText text(row);  // the JSON is made without the lock
     const std::size_t bytes = StoreBatch::bytesOf(row, text);
-    MutexLock lock(mutex_);
+    owner.charge = chargeFor(bytes);
     bool hasTimedOut = false;
-    if (waitForRoom(lock, bytes, hasTimedOut)) {
-      batchWithRoom().add(row, text, owner);
-      countAdded(bytes);
+    StoreCharges givenBack;
+    {
+      MutexLock lock(mutex_);
+      hasTimedOut = waitForRoom(lock, bytes);
+      if (hasTimedOut) givenBack = beginDropping();
+      if (isTaken(owner, bytes)) {
+        batchWithRoom().add(row, text, owner);
+        countAdded(bytes, owner);
+      }
     }
+    givenBack.give();
     return hasTimedOut;
   }
 
@@ -75,7 +93,8 @@ class StoreQueue {
   [[nodiscard]] bool take(StoreBatch& batch, bool wait);
   // A try to write the batch begins.
   void beginAttempt();
-  // The batch is in the file.
+  // The batch is in the file. Like failed(), it gives back charges before flush() returns, and the caller holds
+  // no lock.
   void committed();
   // The batch is not in the file. The writer keeps it.
   void failed();
@@ -96,11 +115,21 @@ class StoreQueue {
   [[nodiscard]] bool isShared(const Row& /*row*/, const StoreRowOwner& /*owner*/) {
     return false;
   }
-  // False when the row is dropped. `hasTimedOut` is set when it waited for the whole hold time.
-  bool waitForRoom(MutexLock& lock, std::size_t bytes, bool& hasTimedOut) REQUIRES(mutex_);
+  // A row of few bytes bears its part of the bound of rows.
+  std::size_t chargeFor(std::size_t bytes) const { return std::max(bytes, limits_.bytes / limits_.rows); }
+  // True when it waited for the whole hold time without success.
+  [[nodiscard]] bool waitForRoom(MutexLock& lock, std::size_t bytes) REQUIRES(mutex_);
+  // From now on add() does not wait and charges nobody. Returns what is to be given back when the lock is
+  // released.
+  [[nodiscard]] StoreCharges beginDropping() REQUIRES(mutex_);
+  // What the rows in the queue bear, those that are being written included.
+  StoreCharges charges() const REQUIRES(mutex_);
+  // Whether there is room for the row. If not, it counts as dropped.
+  [[nodiscard]] bool isTaken(const StoreRowOwner& owner, std::size_t bytes) REQUIRES(mutex_);
+  [[nodiscard]] bool isWithinHalf(const StoreRowOwner& owner) const REQUIRES(mutex_);
   // The batch for the next row.
   StoreBatch& batchWithRoom() REQUIRES(mutex_);
-  void countAdded(std::size_t bytes) REQUIRES(mutex_);
+  void countAdded(std::size_t bytes, const StoreRowOwner& owner) REQUIRES(mutex_);
   bool fits(std::size_t bytes) const REQUIRES(mutex_);
   bool isUrgent() const REQUIRES(mutex_);
 
@@ -118,7 +147,9 @@ class StoreQueue {
   std::size_t queuedBytes_ GUARDED_BY(mutex_) = 0;
   std::size_t takenRows_ GUARDED_BY(mutex_) = 0;
   std::size_t takenBytes_ GUARDED_BY(mutex_) = 0;
-  bool waitsForRoom_ GUARDED_BY(mutex_) = true;  // whether add() waits for room
+  StoreCharges takenCharges_ GUARDED_BY(mutex_);
+  // Whether add() waits for room. Then, and only then, all rows in the queue are charged.
+  bool waitsForRoom_ GUARDED_BY(mutex_) = true;
   bool stopped_ GUARDED_BY(mutex_) = false;
   bool isWoken_ GUARDED_BY(mutex_) = false;
   std::uint64_t added_ GUARDED_BY(mutex_) = 0;

@@ -4,6 +4,7 @@
 #include <gmock/gmock.h>
 
 #include "platform/Log.h"
+#include "platform/accounts/Accounts.h"
 #include "platform/linux/otlp/CurlHttpClient.h"
 #include "platform/linux/store/ReportStore.h"
 #include "support/OtlpReceiver.h"
@@ -69,7 +70,8 @@ class LinuxLinkReportTest : public testing::Test {
   LogCategory category_{log_, "com.orvane.tonewerk", "twrs"};
   MemoryJsonService json_;
   MemoryPreferenceStore preferences_;
-  ReportStore store_{directory_.path(), json_, preferences_, clock_, category_};
+  Accounts accounts_{990, clock_};
+  ReportStore store_{directory_.path(), json_, preferences_, clock_, accounts_, category_};
   OtlpReceiver receiver_;
   LinuxLinkReport service_{
       store_, preferences_, clock_, category_, "1.2.3", [] {

@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "platform/Log.h"
+#include "platform/accounts/Accounts.h"
 #include "platform/linux/store/ReportStore.h"
 #include "platform/linux/store/StoreEnergybook.h"
 #include "support/TemporaryDirectory.h"
@@ -71,7 +72,8 @@ class StoreSide {
   LogCategory category_{log_, "com.orvane.tonewerk", "twrs"};
   MemoryJsonService json_;
   MemoryPreferenceStore preferences_;
-  ReportStore store_{directory_.path(), json_, preferences_, clock_, category_};
+  Accounts accounts_{990, clock_};
+  ReportStore store_{directory_.path(), json_, preferences_, clock_, accounts_, category_};
   StoreEnergybook energybook_{store_, clock_};
 };
 

@@ -49,7 +49,8 @@ class ReportStoreTest : public testing::Test {
  protected:
   void open(const ReportStore::Limits& limits = {}) {
     store_.reset();
-    store_ = std::make_unique<ReportStore>(directory_, json_, preferences_, clock_, category_, limits);
+    store_ =
+        std::make_unique<ReportStore>(directory_, json_, preferences_, clock_, accounts_, category_, limits);
   }
   void close() { store_.reset(); }
 
@@ -362,6 +363,26 @@ TEST_F(BrokenReportStoreTest, NeverMakesRecordingWaitAndCountsTheRowsItDrops) {
   EXPECT_TRUE(flush());
   EXPECT_THAT(payloads(), ElementsAre(R"({"n":0})", R"({"n":1})", R"({"n":2})", R"({"n":3})"));
   EXPECT_THAT(errors(), ElementsAre(HasSubstr("cannot write"), HasSubstr("rows dropped meanwhile: 6")));
+}
+
+TEST_F(BrokenReportStoreTest, ChargesNobodyUntilItWritesAgain) {
+  const std::shared_ptr<Account> account = accounts_.of(1001);
+  open(small());
+  EXPECT_EQ(accounts_.totals().total(Resource::kSinkBytes), small().bytes);
+  {
+    const WorkingFor scope(account);
+    recordNumbered(2);
+    EXPECT_FALSE(flush());
+    EXPECT_EQ(account->held(Resource::kSinkBytes), 0U);
+    recordNumbered(8, 2);
+    EXPECT_EQ(account->held(Resource::kSinkBytes), 0U);
+    EXPECT_EQ(account->refused(Resource::kSinkBytes), 8U);  // the rows of one user fill half of the queue
+  }
+  recordNumbered(1, 10);
+  repairDirectory();
+  EXPECT_TRUE(flush());
+  EXPECT_THAT(payloads(), ElementsAre(R"({"n":0})", R"({"n":1})", R"({"n":10})"));
+  EXPECT_EQ(account->held(Resource::kSinkBytes), 0U);
 }
 
 TEST_F(BrokenReportStoreTest, CountsTheLostRowsAtTheEnd) {

@@ -52,7 +52,8 @@ class SharedRowTest : public testing::Test {
     // No batch ends between an event and its message, however large they are.
     limits.gather = kLongEnough;
     limits.bytes = 256 << 20;
-    store_ = std::make_unique<ReportStore>(directory_.path(), json_, preferences_, clock_, category_, limits);
+    store_ = std::make_unique<ReportStore>(directory_.path(), json_, preferences_, clock_, accounts_,
+                                           category_, limits);
   }
   void recordEvent(const ValueMap& payload, const EventNames& names = kNames) {
     store_->recordEvent(clock_.now(), names, payload);

@@ -4,6 +4,7 @@
 #include <gtest/gtest.h>
 
 #include "platform/Log.h"
+#include "platform/accounts/Accounts.h"
 #include "platform/linux/protobuf/ProtozeroReader.h"
 #include "platform/linux/store/ReportStore.h"
 #include "platform/linux/store/SqliteDatabase.h"
@@ -26,7 +27,8 @@ TEST(StoreDiagwireTest, KeepsTheRecordWithItsTimeAndIdentifier) {
   const LogCategory category(log, "com.orvane.tonewerk", "twrs");
   const MemoryJsonService json;
   const MemoryPreferenceStore preferences;
-  ReportStore store(temporary.path("state"), json, preferences, clock, category);
+  Accounts accounts(990, clock);
+  ReportStore store(temporary.path("state"), json, preferences, clock, accounts, category);
   StoreDiagwire diagwire(store, clock);
   diagwiremetrics::AudioIssueDetected record;
   record.node = "mixer";

@@ -6,6 +6,7 @@
 #include <string>
 
 #include "platform/Log.h"
+#include "platform/accounts/Accounts.h"
 #include "platform/linux/store/ReportStore.h"
 #include "support/TemporaryDirectory.h"
 #include "support/manual/ManualClock.h"
@@ -57,7 +58,8 @@ class StoreMetriconTest : public testing::Test {
   LogCategory category_{log_, "com.orvane.tonewerk", "twrs"};
   MemoryJsonService json_;
   MemoryPreferenceStore preferences_;
-  ReportStore store_{directory_.path(), json_, preferences_, clock_, category_};
+  Accounts accounts_{990, clock_};
+  ReportStore store_{directory_.path(), json_, preferences_, clock_, accounts_, category_};
   StoreMetricon metricon_{store_, preferences_, clock_, category_};
 };
 

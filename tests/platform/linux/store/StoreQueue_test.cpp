@@ -1,12 +1,18 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/store/StoreQueue.h"
 
+#include <atomic>
 #include <future>
 #include <gmock/gmock.h>
+#include <memory>
 #include <string>
+#include <string_view>
 #include <vector>
 
+#include "platform/accounts/Accounts.h"
+#include "platform/accounts/WorkingFor.h"
 #include "support/PackedMaps.h"
+#include "support/manual/ManualClock.h"
 
 namespace tonewerk {
 namespace {
@@ -202,6 +208,195 @@ TEST_F(StoreQueueTest, AddWaitsNoLongerThanTheHoldTimeAndReportsThatOnce) {
   ASSERT_TRUE(queue.take(batch_, true));
   EXPECT_EQ(queue.takeDropped(), 2U);
   queue.committed();
+}
+
+// Two users record into a queue of 8 rows or 8,000 bytes: a small row counts as 1,000 bytes.
+class ChargedQueueTest : public testing::Test {
+ protected:
+  ChargedQueueTest() { accounts_.totals().setTotal(kSink, eightRows().bytes); }
+
+  static StoreQueue::Limits eightRows() {
+    StoreQueue::Limits limits = small();
+    limits.rows = 8;
+    limits.bytes = 8000;
+    return limits;
+  }
+  // Records rows for a user. Returns whether one of them has waited for the whole hold time.
+  bool add(const std::shared_ptr<Account>& account, int rows, std::size_t bytes = 0) {
+    const WorkingFor scope(account);
+    bool hasTimedOut = false;
+    for (int n = 0; n < rows; ++n) {
+      hasTimedOut |= queue_.add(AnalyticsRow{0.0, "a", {{"t", std::string(bytes, 'x')}}});
+    }
+    return hasTimedOut;
+  }
+  void takeAndCommit() {
+    ASSERT_TRUE(queue_.take(batch_, false));
+    queue_.committed();
+  }
+
+  static constexpr Resource kSink = Resource::kSinkBytes;
+
+  ManualClock clock_;
+  Accounts accounts_{990, clock_};
+  const std::shared_ptr<Account> first_ = accounts_.of(1001);
+  const std::shared_ptr<Account> second_ = accounts_.of(1002);
+  StoreQueue queue_{eightRows()};
+  StoreBatch batch_;
+};
+
+TEST_F(ChargedQueueTest, ARowIsChargedToItsUserUntilItIsCommitted) {
+  add(first_, 2);
+  add(second_, 1);
+  EXPECT_EQ(first_->held(kSink), 2000U);
+  EXPECT_EQ(second_->held(kSink), 1000U);
+  ASSERT_TRUE(queue_.take(batch_, true));
+  add(first_, 1);
+  EXPECT_EQ(first_->held(kSink), 3000U);
+  queue_.committed();
+  EXPECT_EQ(first_->held(kSink), 1000U);
+  EXPECT_EQ(second_->held(kSink), 0U);
+}
+
+TEST_F(ChargedQueueTest, ALargeRowIsChargedWithItsBytes) {
+  add(first_, 1, 2500);
+  EXPECT_EQ(first_->held(kSink),
+            sizeof(StoreBatch::Analytics) + 2500 + std::string_view(R"({"t":""})").size());
+}
+
+TEST_F(ChargedQueueTest, NobodyIsChargedForARowOfTheDaemonNorForAMessageThatSharesARow) {
+  EXPECT_FALSE(queue_.add(row(1)));
+  const WorkingFor scope(first_);
+  const AnalyticsRow event = row(2);
+  EXPECT_FALSE(queue_.add(event));
+  EXPECT_FALSE(queue_.add(RtcMessageRow{0.0, std::make_shared<RtcSessionRecord>(), 4, 1, event.payload}));
+  EXPECT_EQ(accounts_.totals().held(kSink), 1000U);
+}
+
+TEST_F(ChargedQueueTest, AUserWhoHasFilledHalfHasNoRoomUntilTheCommit) {
+  add(first_, 4);
+  EXPECT_FALSE(first_->hasRoom(kSink));
+  EXPECT_TRUE(second_->hasRoom(kSink));
+  bool isWoken = false;
+  first_->whenRoom(kSink, [&] {
+    isWoken = true;
+    EXPECT_EQ(queue_.takeDropped(), 0U);  // the queue's lock is free
+  });
+  ASSERT_TRUE(queue_.take(batch_, true));
+  EXPECT_FALSE(isWoken);
+  queue_.committed();
+  EXPECT_TRUE(isWoken);
+}
+
+TEST_F(ChargedQueueTest, AFailureGivesBackAllChargesAndNoneIsTakenUntilTheNextCommit) {
+  add(first_, 1);
+  ASSERT_TRUE(queue_.take(batch_, true));
+  add(first_, 1);
+  add(second_, 1);
+  bool isWoken = false;
+  add(first_, 2);
+  first_->whenRoom(kSink, [&] { isWoken = true; });
+  EXPECT_FALSE(isWoken);
+  queue_.failed();
+  EXPECT_TRUE(isWoken);
+  EXPECT_EQ(accounts_.totals().held(kSink), 0U);
+  add(second_, 1);
+  queue_.failed();
+  EXPECT_EQ(accounts_.totals().held(kSink), 0U);
+
+  queue_.committed();  // now the rows behind the batch that is written are charged again
+  EXPECT_EQ(first_->held(kSink), 3000U);
+  EXPECT_EQ(second_->held(kSink), 2000U);
+  takeAndCommit();
+  EXPECT_EQ(accounts_.totals().held(kSink), 0U);
+  add(second_, 1);
+  EXPECT_EQ(second_->held(kSink), 1000U);
+}
+
+TEST_F(ChargedQueueTest, ARowThatWaitedForTheWholeHoldTimeGivesBackAllCharges) {
+  StoreQueue::Limits limits = eightRows();
+  limits.hold = milliseconds(1);
+  StoreQueue queue(limits);
+  const WorkingFor scope(first_);
+  for (int n = 0; n < 8; ++n) EXPECT_FALSE(queue.add(row(n)));
+  ASSERT_TRUE(queue.take(batch_, false));
+  EXPECT_EQ(first_->held(kSink), 8000U);
+  bool isWoken = false;
+  first_->whenRoom(kSink, [&] { isWoken = true; });
+  EXPECT_TRUE(queue.add(row(8)));
+  EXPECT_TRUE(isWoken);
+  EXPECT_EQ(first_->held(kSink), 0U);
+  EXPECT_EQ(first_->refused(kSink), 1U);
+  queue.committed();
+  EXPECT_EQ(first_->held(kSink), 0U);
+}
+
+TEST_F(ChargedQueueTest, WhileRowsAreDroppedOneUserFillsHalfAndLeavesRoomForOthers) {
+  queue_.failed();
+  add(first_, 6);
+  EXPECT_EQ(queue_.takeDropped(), 2U);
+  EXPECT_EQ(first_->refused(kSink), 2U);
+  add(second_, 3);
+  EXPECT_EQ(queue_.takeDropped(), 0U);
+  EXPECT_EQ(queue_.lost(), 7U);
+  EXPECT_EQ(accounts_.totals().held(kSink), 0U);
+}
+
+TEST_F(ChargedQueueTest, WhileRowsAreDroppedTheDaemonsOwnFillTheWholeQueue) {
+  queue_.failed();
+  for (int n = 0; n < 10; ++n) EXPECT_FALSE(queue_.add(row(n)));
+  EXPECT_EQ(queue_.takeDropped(), 2U);
+}
+
+TEST_F(ChargedQueueTest, WhileRowsAreDroppedTheRowsThatAreBeingWrittenCountAsTheUsers) {
+  add(first_, 3);
+  ASSERT_TRUE(queue_.take(batch_, true));
+  queue_.failed();
+  add(first_, 3);
+  EXPECT_EQ(queue_.takeDropped(), 2U);
+}
+
+TEST_F(ChargedQueueTest, WhileRowsAreDroppedTheFirstRowOfAUserMayBeLargerThanHalf) {
+  queue_.failed();
+  add(first_, 2);
+  add(second_, 1, 5000);
+  EXPECT_EQ(queue_.takeDropped(), 0U);
+  add(second_, 1);
+  EXPECT_EQ(queue_.takeDropped(), 1U);
+}
+
+TEST_F(ChargedQueueTest, TheEndOfTheQueueGivesBackWhatNobodyWrote) {
+  {
+    StoreQueue queue(eightRows());
+    const WorkingFor scope(first_);
+    EXPECT_FALSE(queue.add(row(1)));
+    EXPECT_EQ(first_->held(kSink), 1000U);
+  }
+  EXPECT_EQ(first_->held(kSink), 0U);
+}
+
+TEST_F(ChargedQueueTest, ManyThreadsLeaveNothingChargedWhenWritingFailsNowAndThen) {
+  std::vector<std::future<bool>> recorders;
+  recorders.reserve(4);
+  for (int recorder = 0; recorder < 4; ++recorder) {
+    recorders.push_back(std::async(
+        std::launch::async, [this, recorder] { return add(recorder % 2 == 0 ? first_ : second_, 500); }));
+  }
+  std::atomic<bool> hasEnded = false;
+  auto writer = std::async(std::launch::async, [&] {
+    for (int batch = 0; !hasEnded || !batch_.empty(); ++batch) {
+      if (!queue_.take(batch_, false)) return false;
+      if (batch % 3 == 0) queue_.failed();
+      queue_.committed();
+    }
+    return true;
+  });
+  for (auto& recorder : recorders) EXPECT_FALSE(recorder.get());
+  hasEnded = true;
+  EXPECT_TRUE(writer.get());
+  takeAndCommit();
+  EXPECT_EQ(queue_.lost() - queue_.takeDropped(), 0U);
+  EXPECT_EQ(accounts_.totals().held(kSink), 0U);
 }
 
 TEST_F(StoreQueueTest, FlushEndsWithTheCommit) {

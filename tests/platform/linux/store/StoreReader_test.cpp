@@ -10,6 +10,7 @@
 #include <vector>
 
 #include "platform/Log.h"
+#include "platform/accounts/Accounts.h"
 #include "platform/linux/store/ReportStore.h"
 #include "support/TemporaryDirectory.h"
 #include "support/manual/ManualClock.h"
@@ -27,7 +28,8 @@ using testing::IsEmpty;
 class StoreReaderTest : public testing::Test {
  protected:
   void openStore() {
-    store_ = std::make_unique<ReportStore>(directory_.path(), json_, preferences_, clock_, category_);
+    store_ =
+        std::make_unique<ReportStore>(directory_.path(), json_, preferences_, clock_, accounts_, category_);
   }
   // Records an event ten seconds after the one before.
   void record(const std::string& name) {
@@ -51,6 +53,7 @@ class StoreReaderTest : public testing::Test {
   MemoryJsonService json_;
   MemoryPreferenceStore preferences_;
   ManualClock clock_;
+  Accounts accounts_{990, clock_};
   std::unique_ptr<ReportStore> store_;
   StoreReader reader_;
   int recorded_ = 0;

@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "platform/Log.h"
+#include "platform/accounts/Accounts.h"
 #include "platform/linux/json/NlohmannJsonService.h"
 #include "platform/linux/store/ReportStore.h"
 #include "support/TemporaryDirectory.h"
@@ -32,7 +33,8 @@ class RtcCommandTest : public testing::Test {
     MemoryLog log;
     const LogCategory category(log, "com.orvane.tonewerk", "twrs");
     const MemoryPreferenceStore preferences;
-    ReportStore store(directory_.path("state"), json_, preferences, clock, category);
+    Accounts accounts(990, clock);
+    ReportStore store(directory_.path("state"), json_, preferences, clock, accounts, category);
     for (const char* name : {"telephony_session", "vocia"}) {
       auto session = std::make_shared<RtcSessionRecord>();
       session->startedAt = clock.now();
