@@ -32,6 +32,7 @@ ReportStore::ReportStore(const std::string& directory, const JsonService& json,
                          const LogCategory& log, const Limits& limits)
     : preferences_(preferences),
       clock_(clock),
+      accounts_(accounts),
       log_(log),
       queue_(limits),
       database_(directory, json),
@@ -113,6 +114,7 @@ bool ReportStore::write() {
     return false;
   }
   trim();
+  chargeStored();
   return true;
 }
 
@@ -146,6 +148,15 @@ void ReportStore::trim() {
   errorLog(log_, "cannot keep %s within its bounds: %s", database_.path(), loggedTrimProblem_);
 }
 
+// A user who connects later is charged with the next batch.
+void ReportStore::chargeStored() {
+  for (const std::shared_ptr<Account>& account : accounts_.all()) {
+    const std::uint32_t user = account->user();
+    Charge& charge = stored_.try_emplace(user, account, Resource::kStoredBytes, 0).first->second;
+    charge.setTo(static_cast<std::uint64_t>(database_.bytesOf(user)));
+  }
+}
+
 void ReportStore::readBounds() {
   const std::chrono::nanoseconds now = clock_.monotonic();
   if (!areBoundsStale_.exchange(false) && now - boundsReadAt_ < kBoundsInterval) return;
@@ -159,6 +170,7 @@ void ReportStore::readBounds() {
     errorLog(log_, "preferences of %s that are no number from 1 are left out:%s", kPreferenceDomain, wrong);
   }
   loggedWrongBounds_ = wrong;
+  accounts_.totals().setTotal(Resource::kStoredBytes, static_cast<std::uint64_t>(bounds.bytes));
   if (bounds == bounds_) return;
   bounds_ = bounds;
   database_.setBounds(bounds_);

@@ -4,10 +4,12 @@
 #include <atomic>
 #include <chrono>
 #include <cstdint>
+#include <map>
 #include <string>
 #include <string_view>
 #include <thread>
 
+#include "platform/accounts/Account.h"
 #include "platform/linux/store/StoreBatch.h"
 #include "platform/linux/store/StoreDatabase.h"
 #include "platform/linux/store/StoreQueue.h"
@@ -29,8 +31,9 @@ class PreferenceStore;
 // wait: rows are kept while there is room and then dropped. Their number is logged when writing succeeds
 // again, and at the end. A damaged file is moved aside.
 //
-// A row belongs to the user for whom the recording thread works (WorkingFor). The user's account is charged for
-// the row's place in the queue; see StoreQueue.
+// A row belongs to the user for whom the recording thread works (WorkingFor). The user's account is charged
+// for the row's place in the queue (StoreQueue), and for its bytes in the file. When the file is at its
+// bound, the user who holds the most loses the oldest rows (StoreTrimmer).
 //
 // The bounds are the preferences "max_megabytes" (256) and "max_days" (30) of the domain
 // "com.orvane.tonewerk.store". They are read again every ten seconds while there is something to write, and
@@ -43,8 +46,9 @@ class ReportStore {
 
   using Limits = StoreQueue::Limits;
 
-  // The file is in `directory`, which is made when it is missing. All references outlive the store. The total
-  // of Resource::kSinkBytes in `accounts` becomes that of `limits`.
+  // The file is in `directory`, which is made when it is missing. All references outlive the store. In
+  // `accounts` the total of Resource::kSinkBytes becomes that of `limits`, and the total of kStoredBytes the
+  // bound of size.
   ReportStore(const std::string& directory, const JsonService& json, const PreferenceStore& preferences,
               const Clock& clock, Accounts& accounts, const LogCategory& log, const Limits& limits = {});
   ReportStore(const ReportStore&) = delete;
@@ -82,6 +86,7 @@ class ReportStore {
   [[nodiscard]] StoreDatabase::Result writeOrBeginAnew();
   [[nodiscard]] bool moveAside();
   void trim();
+  void chargeStored();
   void readBounds();
   double bound(std::string_view key, double otherwise, std::string& wrong) const;
   void logFailure();
@@ -89,6 +94,7 @@ class ReportStore {
 
   const PreferenceStore& preferences_;
   const Clock& clock_;
+  Accounts& accounts_;
   const LogCategory& log_;
   StoreQueue queue_;
   std::atomic<bool> areBoundsStale_ = true;
@@ -96,6 +102,7 @@ class ReportStore {
   // Used by the thread alone.
   StoreDatabase database_;
   StoreBatch batch_;
+  std::map<std::uint32_t, Charge> stored_;  // what the rows of each user count
   StoreBounds bounds_;
   std::chrono::nanoseconds boundsReadAt_{0};
   bool ageDue_ = false;  // the oldest rows are to be checked

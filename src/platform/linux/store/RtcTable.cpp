@@ -24,6 +24,7 @@ RtcTable::~RtcTable() {
 }
 
 bool RtcTable::insertSessions(const StoreBatch& batch) {
+  newSessions_.clear();
   for (std::size_t at = 0; at < batch.sessions().size(); ++at) {
     const auto& session = batch.sessions()[at];
     if (!has(*session) && !insertSession(session, batch.sessionUsers()[at])) return false;
@@ -82,6 +83,7 @@ bool RtcTable::insertSession(const std::shared_ptr<RtcSessionRecord>& session, s
   if (!identifier) return false;
   session->place = {*identifier, fileNumber_};
   uncommitted_.push_back(session);
+  newSessions_.push_back({user, static_cast<std::int64_t>(sessionInfo.size() + userInfo.size())});
   return true;
 }
 

@@ -34,6 +34,12 @@ class RtcTable final : private SqliteRows {
   [[nodiscard]] bool insertSessions(const StoreBatch& batch);
   // Inserts the messages that have a row of their own, under these identifiers, after their sessions.
   [[nodiscard]] bool insertMessages(const StoreBatch& batch, std::span<const std::int64_t> identifiers);
+  // A session that the last insertSessions() has inserted, with the bytes of its texts.
+  struct NewSession {
+    std::uint32_t user = 0;
+    std::int64_t bytes = 0;
+  };
+  std::span<const NewSession> newSessions() const { return newSessions_; }
   // The inserted rows are in the file.
   void committed();
 
@@ -51,6 +57,7 @@ class RtcTable final : private SqliteRows {
   const StoreBatch* batch_ = nullptr;          // while its messages are inserted
   std::span<const std::int64_t> identifiers_;  // of its messages
   std::vector<std::shared_ptr<RtcSessionRecord>> uncommitted_;
+  std::vector<NewSession> newSessions_;
 };
 
 }  // namespace tonewerk

@@ -8,8 +8,8 @@
 
 namespace tonewerk {
 
-// How many bytes of Resource::kSinkBytes which accounts have to bear for rows that are not written yet. It only
-// counts, until charge() or give() is called. The accounts outlive it. Used by one thread at a time.
+// How many bytes of Resource::kSinkBytes which accounts have to bear for rows that are not written yet. It
+// only counts, until charge() or give() is called. The accounts outlive it. Used by one thread at a time.
 class StoreCharges {
  public:
   void add(Account& account, std::size_t bytes);

@@ -30,9 +30,12 @@ StoreDatabase::Result StoreDatabase::write(const StoreBatch& batch) {
 }
 
 bool StoreDatabase::insert(const StoreBatch& batch) {
-  return numbering_->number(batch) && rtc_->insertSessions(batch) && analytics_->insert(batch, *numbering_) &&
-         metrics_->insert(batch) && power_->insert(batch) &&
-         rtc_->insertMessages(batch, numbering_->rtcMessages());
+  if (!holdings_->add(batch) || !rtc_->insertSessions(batch)) return false;
+  for (const RtcTable::NewSession& session : rtc_->newSessions()) {
+    holdings_->addRow(session.user, session.bytes);
+  }
+  return numbering_->number(batch) && analytics_->insert(batch, *numbering_) && metrics_->insert(batch) &&
+         power_->insert(batch) && rtc_->insertMessages(batch, numbering_->rtcMessages());
 }
 
 void StoreDatabase::setBounds(const StoreBounds& bounds) {
@@ -47,6 +50,7 @@ StoreDatabase::Result StoreDatabase::trimAge(double now, bool& moreToDo) {
 
 StoreDatabase::Result StoreDatabase::trimSize(bool& moreToDo) {
   if (!database_.isOpen()) return Result::kDone;
+  if (!holdings_->read()) return fail();
   return resultOf(trimmer_->trimSize(bounds_), moreToDo);
 }
 
@@ -82,7 +86,10 @@ StoreDatabase::Result StoreDatabase::open() {
   if (*version == 1 && !database_.run(storeMigration())) return fail();
   if (*version == kStoreSchemaVersion && !addUserColumns()) return fail();
   // With this a commit costs no sync; each checkpoint makes one. A power cut loses the newest rows.
-  if (!database_.run("PRAGMA journal_mode = WAL; PRAGMA synchronous = NORMAL")) return fail();
+  if (!database_.run("PRAGMA journal_mode = WAL; PRAGMA synchronous = NORMAL;"
+                     " PRAGMA temp_store = MEMORY")) {
+    return fail();
+  }
   applyBounds();
   begin_ = database_.prepare("BEGIN IMMEDIATE");
   commit_ = database_.prepare("COMMIT");
@@ -91,7 +98,8 @@ StoreDatabase::Result StoreDatabase::open() {
   metrics_.emplace(database_);
   power_.emplace(database_);
   rtc_.emplace(database_, json_, fileNumber_);
-  trimmer_.emplace(database_);
+  holdings_.emplace(database_);
+  trimmer_.emplace(database_, *holdings_);
   return Result::kDone;
 }
 
@@ -153,6 +161,7 @@ void StoreDatabase::close() {
   power_.reset();
   rtc_.reset();
   trimmer_.reset();
+  holdings_.reset();
   database_.close();
 }
 

@@ -11,6 +11,7 @@
 #include "platform/linux/store/RtcTable.h"
 #include "platform/linux/store/SqliteDatabase.h"
 #include "platform/linux/store/StoreBatch.h"
+#include "platform/linux/store/StoreHoldings.h"
 #include "platform/linux/store/StoreNumbering.h"
 #include "platform/linux/store/StoreTrimmer.h"
 
@@ -40,6 +41,9 @@ class StoreDatabase {
   // Sets `moreToDo` when another slice is needed. Does nothing while the file is closed.
   [[nodiscard]] Result trimAge(double now, bool& moreToDo);
   [[nodiscard]] Result trimSize(bool& moreToDo);
+  // What the rows of a user count (StoreHolding). 0 while the file is closed, and before the first
+  // trimSize(), which reads the rows that were there.
+  std::int64_t bytesOf(std::uint32_t user) const { return holdings_ ? holdings_->of(user) : 0; }
   // Renames the file and its side files to "<path>.corrupt...", and replaces those of an earlier time. On
   // failure it is false, and problem() describes it.
   [[nodiscard]] bool moveAside();
@@ -73,6 +77,7 @@ class StoreDatabase {
   std::optional<MetricTable> metrics_;
   std::optional<PowerTable> power_;
   std::optional<RtcTable> rtc_;
+  std::optional<StoreHoldings> holdings_;
   std::optional<StoreTrimmer> trimmer_;
   // Numbers the files that this process began or found; this is the open one's number.
   std::uint64_t fileNumber_ = 1;

@@ -25,8 +25,8 @@ namespace tonewerk {
 //
 // Rows count against the bounds until they are committed. While writing succeeds, add() waits for room. After
 // failed(), or when the writer makes no progress for the hold time, add() does not wait until the next
-// committed(): rows that do not fit are dropped and counted. Then the rows of one user also fit only into half
-// of the bytes, so that there is room for others' rows.
+// committed(): rows that do not fit are dropped and counted. Then the rows of one user also fit only into
+// half of the bytes, so that there is room for others' rows.
 //
 // While add() waits for room, the user of each row is charged for it (Resource::kSinkBytes). So whoever gives
 // work to the recording threads can let a user's work wait before it fills the queue and all others wait.
@@ -51,8 +51,9 @@ class StoreQueue {
   // Gives back what is still charged.
   ~StoreQueue();
 
-  // Any thread, which holds no lock, because other users' work may go on within the call. `row` is of any type that StoreBatch takes, and belongs to the user for whom the thread works
-  // (WorkingFor). True when this row waited for the whole hold time, so that from now on rows are dropped.
+  // Any thread, which holds no lock, because other users' work may go on within the call. `row` is of any
+  // type that StoreBatch takes, and belongs to the user for whom the thread works (WorkingFor). True when
+  // this row waited for the whole hold time, so that from now on rows are dropped.
   template <typename Row>
   [[nodiscard]] bool add(const Row& row) {
     StoreRowOwner owner;
@@ -93,8 +94,8 @@ class StoreQueue {
   [[nodiscard]] bool take(StoreBatch& batch, bool wait);
   // A try to write the batch begins.
   void beginAttempt();
-  // The batch is in the file. Like failed(), it gives back charges before flush() returns, and the caller holds
-  // no lock.
+  // The batch is in the file. Like failed(), it gives back charges before flush() returns, and the caller
+  // holds no lock.
   void committed();
   // The batch is not in the file. The writer keeps it.
   void failed();

@@ -49,6 +49,9 @@ inline constexpr std::array<StoreTable, 5> kStoreTables{{
     {"rtc_row", "sent_at", "length(CAST(payload AS BLOB))", "payload = '{}'"},
 }};
 
+// What a row counts beside its `bytes`: about the bytes of its identifier and its other columns.
+inline constexpr std::int64_t kStoreRowBytes = 32;
+
 // The SQL that makes the schema in an empty database, user_version included, in one transaction.
 std::string storeSchema();
 

@@ -5,6 +5,7 @@
 #include <array>
 #include <cstddef>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "platform/linux/store/StoreSchema.h"
@@ -17,7 +18,7 @@ constexpr std::int64_t kMaxWalBytes = 8 << 20;
 
 // The number of rows of a table that one statement deletes for their age.
 constexpr std::int64_t kChunkRows = 500;
-// The number of rows of all tables, or of bytes, that one round deletes for their size.
+// The number of rows of all tables, or of bytes, that one round looks at to delete some for their size.
 constexpr int kRowsPerRound = 2000;
 constexpr std::int64_t kBytesPerRound = 2 << 20;
 constexpr int kRoundsPerSlice = 16;
@@ -25,6 +26,8 @@ constexpr int kRoundsPerSlice = 16;
 constexpr std::int64_t kVacuumPages = 512;
 // At least this many free pages stay for new rows, unless the file is too large.
 constexpr std::int64_t kSpareFreePages = 64;
+// Rows of more bytes have pages of their own.
+constexpr std::int64_t kSmallRowBytes = 4096;
 
 // Orders by identifier, which changes of the clock do not affect. The newest row stays, so that its
 // identifier is not used again: a reader that continues after the last row it saw misses none. That of
@@ -33,63 +36,164 @@ std::string oldestRows(const StoreTable& table, const std::string& columns) {
   const std::string name(table.name);
   std::string newest = "(SELECT max(id) FROM " + name + ")";
   if (name == "rtc_row") newest = "max(" + newest + ", coalesce((SELECT max(id) FROM analytics_row), 0))";
-  return "SELECT " + columns + " FROM " + name + " WHERE id < " + newest + " ORDER BY id";
+  return "SELECT " + columns + " FROM " + name + " WHERE id >= ?1 AND id < " + newest + " ORDER BY id";
 }
 
 std::string oldestChunk(const StoreTable& table) {
   return oldestRows(table, "id") + " LIMIT " + std::to_string(kChunkRows);
 }
 
-// Walks through one table, from its oldest row on.
+void bindUser(SqliteStatement& statement, int parameter, std::uint32_t user) {
+  if (user == kNoUser) {
+    statement.bindNull(parameter);
+  } else {
+    statement.bind(parameter, static_cast<std::int64_t>(user));
+  }
+}
+
+// What a round may still look at.
+struct RoundBudget {
+  int rows = kRowsPerRound;
+  std::int64_t bytes = kBytesPerRound;
+
+  bool isUsedUp() const { return rows <= 0 || bytes <= 0; }
+  void use(std::int64_t rowBytes) {
+    --rows;
+    bytes -= rowBytes;
+  }
+};
+
+// Walks through the rows of one user in one table, from the oldest on. The rows of other users between them
+// are looked at, too, because there is no index by user: it would cost every commit another page.
 class OldestRows {
  public:
-  OldestRows(SqliteDatabase& database, const StoreTable& table)
-      : select_(database.prepare(
-            oldestRows(table, "id, " + std::string(table.time) + ", " + std::string(table.bytes)))) {
+  OldestRows(SqliteDatabase& database, const StoreTable& table, std::uint32_t user, std::int64_t from)
+      : user_(user),
+        from_(from),
+        select_(database.prepare(oldestRows(
+            table, "id, " + std::string(table.time) + ", " + std::string(table.bytes) + ", user_id"))) {
+    select_.bind(1, from);
     step();
   }
 
+  // Goes on to a row of the user. False when the budget is used up before.
+  bool find(RoundBudget& budget) {
+    while (at_ == SqliteStatement::Step::kRow && userOf(select_, 3) != user_) {
+      if (budget.isUsedUp()) return false;
+      budget.use(bytes());
+      hasPassedOthers_ = passed_ != 0;
+      step();
+    }
+    return true;
+  }
   bool hasFailed() const { return at_ == SqliteStatement::Step::kFailed; }
   bool hasRow() const { return at_ == SqliteStatement::Step::kRow; }
   double time() const { return select_.number(1); }
 
-  // Moves to the next row, and marks the current one for deletion. Returns the bytes that the current row
-  // holds.
-  std::int64_t pass() {
+  // Moves to the next row of any user, and marks the current one for deletion. Returns the bytes that the
+  // current row counts.
+  std::int64_t pass(RoundBudget& budget) {
+    const std::int64_t passedBytes = bytes();
+    budget.use(passedBytes);
     passed_ = select_.integer(0);
-    const std::int64_t bytes = select_.integer(2) + kLeastRowBytes;
+    if (first_ == 0) first_ = passed_;
+    areOthersBetween_ = areOthersBetween_ || hasPassedOthers_;
     step();
-    return bytes;
+    return passedBytes;
   }
-  // The identifier of the last marked row; 0 when there is none.
+  // The identifiers of the first and of the last marked row; 0 when there is none.
+  std::int64_t first() const { return first_; }
   std::int64_t passed() const { return passed_; }
+  // Whether rows of other users are between these.
+  bool areOthersBetween() const { return areOthersBetween_; }
+  // No row of the user that is not marked has a lower identifier.
+  std::int64_t from() const { return from_; }
 
  private:
-  // The least bytes of a row: its identifier, its time and the lengths of its columns.
-  static constexpr std::int64_t kLeastRowBytes = 16;
+  std::int64_t bytes() const { return select_.integer(2) + kStoreRowBytes; }
+  void step() {
+    if (at_ == SqliteStatement::Step::kRow) from_ = select_.integer(0) + 1;
+    at_ = select_.step();
+  }
 
-  void step() { at_ = select_.step(); }
-
+  const std::uint32_t user_;
+  std::int64_t from_;
   SqliteStatement select_;
   SqliteStatement::Step at_ = SqliteStatement::Step::kDone;
+  std::int64_t first_ = 0;
   std::int64_t passed_ = 0;
+  bool hasPassedOthers_ = false;
+  bool areOthersBetween_ = false;
 };
 
-// The table whose current row is the oldest of all. Null when no row is left.
-OldestRows* oldestOf(std::vector<OldestRows>& tables) {
-  OldestRows* oldest = nullptr;
-  for (OldestRows& table : tables) {
-    if (table.hasRow() && (oldest == nullptr || table.time() < oldest->time())) oldest = &table;
+// A user whose oldest rows are deleted in one round.
+class OldestRowsOfUser {
+ public:
+  OldestRowsOfUser(SqliteDatabase& database, StoreHolding& holding)
+      : holding_(&holding), left_(holding.bytes) {
+    tables_.reserve(kStoreTables.size());
+    for (std::size_t at = 0; at < kStoreTables.size(); ++at) {
+      tables_.emplace_back(database, kStoreTables[at], holding.user, holding.from[at]);
+    }
   }
-  return oldest;
-}
+
+  const StoreHolding& holding() const { return *holding_; }
+  // What is left to the user after the marked rows.
+  std::int64_t left() const { return left_; }
+  // Whether no more of the user's rows can be deleted.
+  bool isDone() const { return isDone_; }
+
+  // Marks the oldest row of all tables for deletion, and returns what it counts. 0 when the budget is used up
+  // before, and when no row is left, which isDone() then says.
+  std::int64_t pass(RoundBudget& budget) {
+    OldestRows* oldest = nullptr;
+    for (OldestRows& table : tables_) {
+      if (!table.find(budget)) return 0;
+      if (table.hasRow() && (oldest == nullptr || table.time() < oldest->time())) oldest = &table;
+    }
+    isDone_ = oldest == nullptr;
+    if (isDone_ || budget.isUsedUp()) return 0;
+    const std::int64_t bytes = oldest->pass(budget);
+    left_ -= bytes;
+    return bytes;
+  }
+  bool hasFailed() const {
+    return std::any_of(tables_.begin(), tables_.end(),
+                       [](const OldestRows& table) { return table.hasFailed(); });
+  }
+
+  struct Range {
+    std::int64_t first = 0;
+    std::int64_t last = 0;
+    bool areOthersBetween = false;
+  };
+  // Ends the reads, so that rows can be deleted, and keeps the result. Returns the marked rows of each table.
+  std::array<Range, kStoreTables.size()> end() {
+    std::array<Range, kStoreTables.size()> ranges;
+    for (std::size_t at = 0; at < ranges.size(); ++at) {
+      const OldestRows& table = tables_[at];
+      ranges[at] = {table.first(), table.passed(), table.areOthersBetween()};
+      holding_->from[at] = table.from();
+    }
+    holding_->bytes = std::max<std::int64_t>(0, left_);
+    tables_.clear();
+    return ranges;
+  }
+
+ private:
+  StoreHolding* holding_;
+  std::int64_t left_;
+  bool isDone_ = false;
+  std::vector<OldestRows> tables_;
+};
 
 }  // namespace
 
 std::int64_t StoreBounds::walBytes() const { return std::clamp(bytes / 8, kMinWalBytes, kMaxWalBytes); }
 
-StoreTrimmer::StoreTrimmer(SqliteDatabase& database)
+StoreTrimmer::StoreTrimmer(SqliteDatabase& database, StoreHoldings& holdings)
     : database_(database),
+      holdings_(holdings),
       countPages_(database.prepare("PRAGMA page_count")),
       countFreePages_(database.prepare("PRAGMA freelist_count")) {}
 
@@ -120,9 +224,9 @@ StoreTrimmer::Outcome StoreTrimmer::deleteForSize(std::int64_t fileBytes) {
     if (!hasEmptied) return Outcome::kFailed;
     if (*hasEmptied) continue;
     // A row takes less than twice its bytes in pages, so half of the excess is never too much.
-    const std::int64_t deleted = deleteOldest(std::clamp((used - low) / 2, pageBytes_, kBytesPerRound));
-    if (deleted < 0) return Outcome::kFailed;
-    if (deleted == 0) return Outcome::kDone;  // no row is left to delete
+    const std::int64_t looked = deleteOldest(std::clamp((used - low) / 2, pageBytes_, kBytesPerRound));
+    if (looked < 0) return Outcome::kFailed;
+    if (looked == 0) return Outcome::kDone;  // no row is left to delete
   }
   return Outcome::kMoreToDo;
 }
@@ -158,12 +262,17 @@ bool StoreTrimmer::measure() {
 std::int64_t StoreTrimmer::deleteUpTo(double time) {
   std::int64_t deleted = 0;
   for (const StoreTable& table : kStoreTables) {
-    SqliteStatement statement =
-        database_.prepare("DELETE FROM " + std::string(table.name) + " WHERE " + std::string(table.time) +
-                          " <= ?1 AND id IN (" + oldestChunk(table) + ")");
-    statement.bind(1, time);
-    if (!statement.run()) return -1;
-    deleted += database_.changes();
+    SqliteStatement statement = database_.prepare(
+        "DELETE FROM " + std::string(table.name) + " WHERE " + std::string(table.time) +
+        " <= ?2 AND id IN (" + oldestChunk(table) + ") RETURNING user_id, " + std::string(table.bytes));
+    statement.bind(1, std::int64_t{0});
+    statement.bind(2, time);
+    SqliteStatement::Step step = SqliteStatement::Step::kDone;
+    while ((step = statement.step()) == SqliteStatement::Step::kRow) {
+      holdings_.removeRow(userOf(statement, 0), statement.integer(1));
+      ++deleted;
+    }
+    if (step == SqliteStatement::Step::kFailed) return -1;
   }
   return deleted;
 }
@@ -174,12 +283,13 @@ std::int64_t StoreTrimmer::deleteUpTo(double time) {
 std::optional<bool> StoreTrimmer::emptyNewest(std::int64_t maxBytes) {
   std::int64_t sum = 0;
   std::int64_t largest = 0;
+  std::uint32_t user = kNoUser;
   std::string emptyLargest;
   for (const StoreTable& table : kStoreTables) {
     const std::string name(table.name);
     const std::string newest = " WHERE id = (SELECT max(id) FROM " + name + ")";
     std::string question = "SELECT ";
-    question.append(table.bytes).append(" FROM ").append(name).append(newest);
+    question.append(table.bytes).append(", user_id FROM ").append(name).append(newest);
     SqliteStatement select = database_.prepare(question);
     const SqliteStatement::Step step = select.step();
     if (step == SqliteStatement::Step::kFailed) return std::nullopt;
@@ -188,42 +298,111 @@ std::optional<bool> StoreTrimmer::emptyNewest(std::int64_t maxBytes) {
     sum += held;
     if (held <= largest) continue;
     largest = held;
+    user = userOf(select, 1);
     emptyLargest = "UPDATE ";
     emptyLargest.append(name).append(" SET ").append(table.empty).append(newest);
+    emptyLargest.append(" RETURNING ").append(table.bytes);
   }
   if (sum <= maxBytes) return false;
-  return database_.run(emptyLargest) ? std::optional(true) : std::nullopt;
+  SqliteStatement update = database_.prepare(emptyLargest);
+  if (update.step() != SqliteStatement::Step::kRow) return std::nullopt;
+  holdings_.removeRow(user, largest);
+  holdings_.addRow(user, update.integer(0));
+  return update.step() == SqliteStatement::Step::kDone ? std::optional(true) : std::nullopt;
 }
 
-// Deletes the oldest rows of all tables until they come to `bytes` or a round is full. Returns the number of
-// rows, or a negative number on failure.
+// Deletes the oldest rows of all tables until they come to `bytes` or a round is full; always those of the
+// user who then holds the most. Returns the number of rows that it has looked at, or a negative number on
+// failure.
 std::int64_t StoreTrimmer::deleteOldest(std::int64_t bytes) {
-  std::vector<OldestRows> tables;
-  tables.reserve(kStoreTables.size());
-  for (const StoreTable& table : kStoreTables) tables.emplace_back(database_, table);
-  std::array<std::int64_t, kStoreTables.size()> ends{};
-  for (int row = 0; row < kRowsPerRound && bytes > 0; ++row) {
-    OldestRows* oldest = oldestOf(tables);
-    if (oldest == nullptr) break;
-    bytes -= oldest->pass();
+  std::vector<OldestRowsOfUser> users;
+  RoundBudget budget;
+  while (bytes > 0 && !budget.isUsedUp()) {
+    // Those without an entry in `users` have lost nothing in this round.
+    OldestRowsOfUser* largest = nullptr;
+    StoreHolding* added = nullptr;
+    std::int64_t most = 0;
+    std::int64_t second = 0;
+    for (StoreHolding& holding : holdings_.all()) {
+      const auto known = std::find_if(users.begin(), users.end(), [&](const OldestRowsOfUser& user) {
+        return &user.holding() == &holding;
+      });
+      if (known != users.end() && known->isDone()) continue;
+      const std::int64_t left = known == users.end() ? holding.bytes : known->left();
+      if (left <= most) {
+        second = std::max(second, left);
+        continue;
+      }
+      second = std::exchange(most, left);
+      largest = known == users.end() ? nullptr : &*known;
+      added = &holding;
+    }
+    if (most == 0) break;
+    if (largest == nullptr) largest = &users.emplace_back(database_, *added);
+    while (bytes > 0 && largest->left() >= second) {
+      const std::int64_t passed = largest->pass(budget);
+      if (passed == 0) break;
+      bytes -= passed;
+    }
   }
-  if (std::any_of(tables.begin(), tables.end(), [](const OldestRows& table) { return table.hasFailed(); })) {
+  if (std::any_of(users.begin(), users.end(),
+                  [](const OldestRowsOfUser& user) { return user.hasFailed(); })) {
     return -1;
   }
-  std::transform(tables.begin(), tables.end(), ends.begin(),
-                 [](const OldestRows& table) { return table.passed(); });
-  tables.clear();  // ends their reads before the rows are deleted
-
-  std::int64_t deleted = 0;
-  for (std::size_t at = 0; at < ends.size(); ++at) {
-    if (ends[at] == 0) continue;
-    SqliteStatement statement =
-        database_.prepare("DELETE FROM " + std::string(kStoreTables[at].name) + " WHERE id <= ?1");
-    statement.bind(1, ends[at]);
-    if (!statement.run()) return -1;
-    deleted += database_.changes();
+  // All reads end before the first row is deleted.
+  std::vector<std::array<OldestRowsOfUser::Range, kStoreTables.size()>> ranges;
+  ranges.reserve(users.size());
+  for (OldestRowsOfUser& user : users) ranges.push_back(user.end());
+  for (std::size_t user = 0; user < users.size(); ++user) {
+    for (std::size_t at = 0; at < kStoreTables.size(); ++at) {
+      const OldestRowsOfUser::Range& range = ranges[user][at];
+      if (range.first == 0) continue;
+      const std::uint32_t number = users[user].holding().user;
+      const bool isDeleted = range.areOthersBetween
+                                 ? deleteBetweenOthers(kStoreTables[at], number, range.first, range.last)
+                                 : deleteRows(kStoreTables[at], number, range.first, range.last);
+      if (!isDeleted) return -1;
+    }
   }
-  return deleted;
+  return kRowsPerRound - budget.rows;
+}
+
+bool StoreTrimmer::deleteRows(const StoreTable& table, std::uint32_t user, std::int64_t first,
+                              std::int64_t last) {
+  SqliteStatement statement = database_.prepare("DELETE FROM " + std::string(table.name) +
+                                                " WHERE id BETWEEN ?1 AND ?2 AND user_id IS ?3");
+  statement.bind(1, first);
+  statement.bind(2, last);
+  bindUser(statement, 3, user);
+  return statement.run();
+}
+
+// Deleting rows between those of others leaves pages that are half empty, and SQLite joins pages only when
+// two thirds of them are empty. The others' rows would then take up to three times their bytes and, although
+// few, the room of everybody. So they are written again, close together. Each row is written again at most
+// once for each other user.
+bool StoreTrimmer::deleteBetweenOthers(const StoreTable& table, std::uint32_t user, std::int64_t first,
+                                       std::int64_t last) {
+  const std::string name = "main." + std::string(table.name);
+  const std::string kept = "temp.kept_" + std::string(table.name);
+  const std::string isSmall = std::string(table.bytes) + " < " + std::to_string(kSmallRowBytes);
+  if (!database_.run("BEGIN IMMEDIATE; CREATE TABLE IF NOT EXISTS " + kept + " AS SELECT * FROM " + name +
+                     " WHERE false")) {
+    return false;
+  }
+  const std::array<std::string, 2> steps{
+      "INSERT INTO " + kept + " SELECT * FROM " + name +
+          " WHERE id BETWEEN ?1 AND ?2 AND user_id IS NOT ?3 AND " + isSmall + " ORDER BY id",
+      "DELETE FROM " + name + " WHERE id BETWEEN ?1 AND ?2 AND (user_id IS ?3 OR " + isSmall + ")"};
+  for (const std::string& sql : steps) {
+    SqliteStatement statement = database_.prepare(sql);
+    statement.bind(1, first);
+    statement.bind(2, last);
+    bindUser(statement, 3, user);
+    if (!statement.run()) return false;
+  }
+  return database_.run("INSERT INTO " + name + " SELECT * FROM " + kept + "; DELETE FROM " + kept +
+                       "; COMMIT");
 }
 
 }  // namespace tonewerk

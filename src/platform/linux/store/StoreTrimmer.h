@@ -5,6 +5,7 @@
 #include <optional>
 
 #include "platform/linux/store/SqliteDatabase.h"
+#include "platform/linux/store/StoreHoldings.h"
 
 namespace tonewerk {
 
@@ -23,6 +24,10 @@ struct StoreBounds {
 // Keeps an open report store within its bounds: deletes the oldest rows of all tables and gives pages back to
 // the file system. Used on the writer's thread, outside transactions.
 //
+// For the bound of size, the oldest rows of the user who holds the most are deleted. So a user who holds less
+// than an equal part of what all rows count loses none, however much others record, and one user alone may
+// use the whole file.
+//
 // It works in slices of some milliseconds, so that rows do not wait long to be written. At its bound the file
 // keeps its size: new rows take the pages of deleted ones, and the pages in use are between nine tenths of
 // the bound and all of it, unless a single row is larger than the difference. For the bound of age only the
@@ -32,13 +37,13 @@ class StoreTrimmer {
  public:
   enum class Outcome { kDone, kMoreToDo, kFailed };
 
-  // `database` is open and outlives it.
-  explicit StoreTrimmer(SqliteDatabase& database);
+  // `database` is open and outlives it, and so does `holdings`, which follows what is deleted.
+  StoreTrimmer(SqliteDatabase& database, StoreHoldings& holdings);
 
   // One slice of deleting for age; `now` is in seconds since 1970. On failure the database has the problem.
   [[nodiscard]] Outcome trimAge(const StoreBounds& bounds, double now);
-  // One slice of deleting for size. It costs little when there is nothing to do, so it can follow every
-  // batch.
+  // One slice of deleting for size, after the holdings were read. It costs little when there is nothing to
+  // do, so it can follow every batch.
   [[nodiscard]] Outcome trimSize(const StoreBounds& bounds);
 
  private:
@@ -47,9 +52,14 @@ class StoreTrimmer {
   [[nodiscard]] bool measure();
   [[nodiscard]] std::int64_t deleteUpTo(double time);
   [[nodiscard]] std::int64_t deleteOldest(std::int64_t bytes);
+  [[nodiscard]] bool deleteRows(const StoreTable& table, std::uint32_t user, std::int64_t first,
+                                std::int64_t last);
+  [[nodiscard]] bool deleteBetweenOthers(const StoreTable& table, std::uint32_t user, std::int64_t first,
+                                         std::int64_t last);
   [[nodiscard]] std::optional<bool> emptyNewest(std::int64_t maxBytes);
 
   SqliteDatabase& database_;
+  StoreHoldings& holdings_;
   // Used after every batch, so they are prepared once.
   SqliteStatement countPages_;
   SqliteStatement countFreePages_;

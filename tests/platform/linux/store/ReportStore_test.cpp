@@ -17,6 +17,7 @@
 #include "platform/accounts/Accounts.h"
 #include "platform/accounts/WorkingFor.h"
 #include "platform/linux/store/FullDisk.h"
+#include "platform/linux/store/StoreSchema.h"
 #include "support/TemporaryDirectory.h"
 #include "support/manual/ManualClock.h"
 #include "support/memory/MemoryJsonService.h"
@@ -863,6 +864,198 @@ TEST_F(BoundedReportStoreTest, WithAnyRowsBetweenNineTenthsOfTheBoundAndAllOfItI
     close();
     std::filesystem::remove_all(directory_);
   }
+}
+
+// Several users record into one store.
+class SharedReportStoreTest : public BoundedReportStoreTest {
+ protected:
+  void recordFor(std::uint32_t user, int n, std::size_t bytes = 1000) {
+    const std::shared_ptr<Account> account = accounts_.of(user);
+    const WorkingFor scope(account);
+    recordRow(n, bytes);
+  }
+  std::int64_t rowsOf(std::uint32_t user) {
+    const std::string is = " WHERE user_id = " + std::to_string(user);
+    return number("SELECT (SELECT count(*) FROM analytics_row" + is +
+                  ") + (SELECT count(*) FROM power_event" + is + ")");
+  }
+  // What the rows of the user count, from the file.
+  std::uint64_t countedBytesOf(std::uint32_t user) {
+    std::int64_t sum = 0;
+    for (const StoreTable& table : kStoreTables) {
+      sum +=
+          number("SELECT coalesce(sum(" + std::string(table.bytes) + " + 32), 0) FROM " +
+                 std::string(table.name) + " WHERE coalesce(user_id, 4294967295) = " + std::to_string(user));
+    }
+    return static_cast<std::uint64_t>(sum);
+  }
+  std::uint64_t storedBytesOf(std::uint32_t user) { return accounts_.of(user)->held(Resource::kStoredBytes); }
+  // Expects that the accounts know exactly what is in the file.
+  void expectExactSums() {
+    for (const std::uint32_t user : {kFirst, kSecond, kNoUser}) {
+      EXPECT_EQ(storedBytesOf(user), countedBytesOf(user)) << user;
+    }
+  }
+
+  static constexpr std::uint32_t kFirst = 1001;
+  static constexpr std::uint32_t kSecond = 1002;
+};
+
+TEST_F(SharedReportStoreTest, AFloodOfOneUserErasesNoRowOfAnother) {
+  openBoundedTo(2);
+  for (int n = 0; n < 300; ++n) recordFor(kFirst, n);
+  for (int n = 0; n < 6000; ++n) recordFor(kSecond, n);
+  ASSERT_TRUE(flush());
+  EXPECT_EQ(rowsOf(kFirst), 300);
+  EXPECT_GT(rowsOf(kSecond), 700);
+  EXPECT_GE(usedPart(), 0.9);
+  EXPECT_LE(usedPart(), 1.0);
+}
+
+TEST_F(SharedReportStoreTest, AFloodOfLargeRowsErasesNoRowOfAnother) {
+  openBoundedTo(8);
+  for (int n = 0; n < 2000; ++n) recordFor(kFirst, n);
+  for (int n = 0; n < 60; ++n) recordFor(kSecond, n, 1'000'000);
+  ASSERT_TRUE(flush());
+  EXPECT_EQ(rowsOf(kFirst), 2000);
+}
+
+TEST_F(SharedReportStoreTest, AFloodOfSmallRowsErasesNoLargeRowsOfAnother) {
+  openBoundedTo(2);
+  for (int n = 0; n < 4; ++n) recordFor(kFirst, n, 150'000);
+  for (int n = 0; n < 40'000; ++n) recordFor(kSecond, n, 10);
+  ASSERT_TRUE(flush());
+  EXPECT_EQ(rowsOf(kFirst), 4);
+}
+
+TEST_F(SharedReportStoreTest, AFloodErasesNoRowOfTheDaemonItself) {
+  openBoundedTo(2);
+  for (int n = 0; n < 300; ++n) recordRow(n, 1000);
+  for (int n = 0; n < 6000; ++n) recordFor(kSecond, n);
+  ASSERT_TRUE(flush());
+  EXPECT_EQ(number("SELECT count(*) FROM analytics_row WHERE user_id IS NULL"), 200);
+}
+
+TEST_F(SharedReportStoreTest, OneUserAloneUsesTheWholeFile) {
+  openBoundedTo(2);
+  for (int n = 0; n < 6000; ++n) recordFor(kFirst, n);
+  ASSERT_TRUE(flush());
+  expectTheNewestOf(6000);
+  EXPECT_GE(usedPart(), 0.9);
+  EXPECT_LE(usedPart(), 1.0);
+}
+
+// Where the rows of a flood have been deleted between those of another user, pages are half empty.
+TEST_F(SharedReportStoreTest, RowsBetweenThoseOfAFloodAreNotErasedAndTakeNoMoreRoomThanTheyNeed) {
+  for (const int every : {2, 3, 10}) {
+    SCOPED_TRACE(every);
+    openBoundedTo(2);
+    int n = 0;
+    int firsts = 0;
+    // The first user gets a third of the file at most.
+    while (firsts < 600 && n < 1500) {
+      ++firsts;
+      recordFor(kFirst, n++, 900);
+      for (int other = 1; other < every; ++other) recordFor(kSecond, n++, 900);
+    }
+    for (const int end = n + 4000; n < end; ++n) recordFor(kSecond, n, 900);
+    ASSERT_TRUE(flush());
+    EXPECT_EQ(rowsOf(kFirst), firsts);
+    EXPECT_GT(rowsOf(kFirst) + rowsOf(kSecond), 1500);
+    // The rows that were written again have their contents, and their places between the others.
+    EXPECT_EQ(number("SELECT count(*) FROM analytics_row WHERE user_id = 1001 AND payload ->> 'n' % " +
+                     std::to_string(every) + " = 0 AND length(payload ->> 'text') = 900"),
+              number("SELECT count(*) FROM analytics_row WHERE user_id = 1001"));
+    EXPECT_EQ(
+        number("SELECT count(*) FROM (SELECT payload ->> 'n' AS n, lag(payload ->> 'n') OVER (ORDER BY id)"
+               " AS before FROM analytics_row) WHERE n <= before"),
+        0);
+    EXPECT_GE(usedPart(), 0.9);
+    EXPECT_LE(usedPart(), 1.0);
+    EXPECT_EQ(number("SELECT count(*) FROM pragma_integrity_check WHERE integrity_check <> 'ok'"), 0);
+    close();
+    std::filesystem::remove_all(directory_);
+  }
+}
+
+TEST_F(SharedReportStoreTest, UsersWhoRecordAlikeKeepEqualPartsOfTheNewestRows) {
+  openBoundedTo(2);
+  for (int n = 0; n < 6000; ++n) recordFor(n % 4 < 2 ? kFirst : kSecond, n, 900);
+  ASSERT_TRUE(flush());
+  expectTheNewestOf(6000);
+  EXPECT_NEAR(static_cast<double>(rowsOf(kFirst)), static_cast<double>(rowsOf(kSecond)), 30.0);
+}
+
+TEST_F(SharedReportStoreTest, AUserWhoHeldTheWholeFileIsReducedToAPart) {
+  openBoundedTo(2);
+  for (int n = 0; n < 4000; ++n) recordFor(kFirst, n);
+  for (int n = 4000; n < 8000; ++n) recordFor(kSecond, n);
+  ASSERT_TRUE(flush());
+  EXPECT_NEAR(static_cast<double>(rowsOf(kFirst)), static_cast<double>(rowsOf(kSecond)), 150.0);
+  EXPECT_GE(number("SELECT min(payload ->> 'n') FROM power_event WHERE user_id = 1001"), 3000);
+}
+
+TEST_F(SharedReportStoreTest, TheAccountsKnowWhatIsInTheFileAfterEachCommit) {
+  openBoundedTo(2);
+  ASSERT_NE(accounts_.of(kNoUser), nullptr);  // the account is there
+  const auto session = std::make_shared<RtcSessionRecord>();
+  session->sessionInfo = {{"a", 1}};
+  for (int n = 0; n < 3000; ++n) {
+    recordFor(n % 5 == 0 ? kFirst : kSecond, n, static_cast<std::size_t>(n % 1700));
+    if (n % 7 == 0) recordRow(n, 500);
+    if (n % 100 != 99) continue;
+    store_->record(MetricRow{clock_.now(), 1, "record"});
+    store_->record(RtcMessageRow{clock_.now(), session, 4, 1, {{"n", n}}});
+    ASSERT_TRUE(flush());
+    expectExactSums();
+  }
+  EXPECT_EQ(accounts_.totals().total(Resource::kStoredBytes), 2U << 20);
+  close();
+  EXPECT_EQ(accounts_.totals().held(Resource::kStoredBytes), 0U);
+  open();
+  recordFor(kFirst, 3000);
+  ASSERT_TRUE(flush());
+  EXPECT_GT(storedBytesOf(kFirst), 100'000U);
+  expectExactSums();
+}
+
+TEST_F(SharedReportStoreTest, TheAccountsKnowWhichRowsWentForTheirAge) {
+  open();
+  for (int n = 0; n < 800; ++n) recordFor(kFirst, n, 10);
+  clock_.advance(20 * kDay);
+  recordFor(kSecond, 1);
+  ASSERT_TRUE(flush());
+  clock_.advance(11 * kDay);
+  for (int n = 800; n < 802; ++n) recordFor(kFirst, n, 10);  // one in each table
+  ASSERT_TRUE(flush());
+  EXPECT_EQ(rowsOf(kFirst), 2);
+  expectExactSums();
+}
+
+TEST_F(SharedReportStoreTest, TheAccountsKnowThatANewestRowWasEmptied) {
+  openBoundedTo(1);
+  recordFor(kFirst, 0, 3'000'000);
+  ASSERT_TRUE(flush());
+  EXPECT_LT(storedBytesOf(kFirst), 100U);
+  expectExactSums();
+}
+
+TEST_F(SharedReportStoreTest, AnAccountThatIsMadeLaterIsChargedForTheRowsOfItsUser) {
+  open();
+  recordFor(kFirst, 1);
+  ASSERT_TRUE(flush());
+  close();
+  SqliteDatabase other;
+  ASSERT_TRUE(other.open(file(), SqliteDatabase::Mode::kReadWrite, kLongEnough));
+  ASSERT_TRUE(other.run("UPDATE power_event SET user_id = 1002; UPDATE analytics_row SET user_id = 1002"));
+  other.close();
+  open();
+  recordFor(kFirst, 2);
+  ASSERT_TRUE(flush());
+  EXPECT_EQ(storedBytesOf(kSecond), 0U);
+  recordFor(kFirst, 3);
+  ASSERT_TRUE(flush());
+  EXPECT_GT(storedBytesOf(kSecond), 1000U);
 }
 
 TEST_F(ReportStoreTest, IgnoresBoundsThatAreNoNumberFromOne) {
