@@ -16,6 +16,7 @@
 #include "platform/Clock.h"
 #include "platform/Log.h"
 #include "platform/accounts/Accounts.h"
+#include "platform/accounts/WorkingFor.h"
 #include "platform/linux/store/ReportStore.h"
 #include "platform/linux/store/StoreMetricon.h"
 #include "support/TemporaryDirectory.h"
@@ -132,6 +133,56 @@ void RecordEvents(benchmark::State& state) {
   benchmark::DoNotOptimize(store.store.flush(kLongEnough));
 }
 BENCHMARK(RecordEvents)->Iterations(400'000)->MeasureProcessCPUTime()->Unit(benchmark::kNanosecond);
+
+// Events of users who take turns, in groups of 64, while the file stays at a bound of 16 MiB: as much is
+// deleted as recorded. The argument is the number of users.
+void RecordAtTheBound(benchmark::State& state) {
+  Store store;
+  store.preferences.configure("com.orvane.tonewerk.store", "max_megabytes", 16);
+  const std::vector<ValueMap> events = payloads();
+  const std::vector<EventNames> names = kinds();
+  std::vector<std::shared_ptr<Account>> users;
+  for (std::uint32_t user = 0; user < state.range(0); ++user) users.push_back(store.accounts.of(1001 + user));
+  std::size_t at = 0;
+  const double before = threadNanoseconds();
+  for (auto _ : state) {
+    const WorkingFor scope(users[at / 64 % users.size()]);
+    const ValueMap& event = events[at % events.size()];
+    store.metricon.sendEvent(names[at % names.size()], [&event] { return event; });
+    ++at;
+    if (at % 65'536 == 0) benchmark::DoNotOptimize(store.store.flush(kLongEnough));
+  }
+  state.counters["recording"] =
+      benchmark::Counter(threadNanoseconds() - before, benchmark::Counter::kAvgIterations);
+  benchmark::DoNotOptimize(store.store.flush(kLongEnough));
+}
+BENCHMARK(RecordAtTheBound)
+    ->Arg(1)
+    ->Arg(2)
+    ->Arg(8)
+    ->Iterations(400'000)
+    ->MeasureProcessCPUTime()
+    ->Unit(benchmark::kNanosecond);
+
+// The first event after a start with a file of about 230 MiB, which is read once.
+void OpenAFullStore(benchmark::State& state) {
+  Store store;
+  const std::vector<ValueMap> events = payloads();
+  const std::vector<EventNames> names = kinds();
+  const auto record = [&](ReportStore& target, std::size_t at) {
+    target.recordEvent(store.clock.now(), names[at % names.size()], events[at % events.size()]);
+  };
+  for (std::size_t at = 0; at < 550'000; ++at) record(store.store, at);
+  if (!store.store.flush(kLongEnough)) state.SkipWithError("not written");
+  std::size_t at = 0;
+  for (auto _ : state) {
+    ReportStore again(store.directory.path(), store.json, store.preferences, store.clock, store.accounts,
+                      store.category);
+    record(again, at++);
+    if (!again.flush(kLongEnough)) state.SkipWithError("not written");
+  }
+}
+BENCHMARK(OpenAFullStore)->Iterations(5)->Unit(benchmark::kMillisecond);
 
 // Events that are real-time-communication messages, too.
 void RecordMessages(benchmark::State& state) {

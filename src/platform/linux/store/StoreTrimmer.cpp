@@ -18,9 +18,10 @@ constexpr std::int64_t kMaxWalBytes = 8 << 20;
 
 // The number of rows of a table that one statement deletes for their age.
 constexpr std::int64_t kChunkRows = 500;
-// The number of rows of all tables, or of bytes, that one round looks at to delete some for their size.
-constexpr int kRowsPerRound = 2000;
+// The number of bytes that one round deletes for their size, and of the rows or bytes that it looks at.
 constexpr std::int64_t kBytesPerRound = 2 << 20;
+constexpr int kLookedRowsPerRound = 6000;
+constexpr std::int64_t kLookedBytesPerRound = 6 << 20;
 constexpr int kRoundsPerSlice = 16;
 // The number of pages that a slice gives back.
 constexpr std::int64_t kVacuumPages = 512;
@@ -53,8 +54,8 @@ void bindUser(SqliteStatement& statement, int parameter, std::uint32_t user) {
 
 // What a round may still look at.
 struct RoundBudget {
-  int rows = kRowsPerRound;
-  std::int64_t bytes = kBytesPerRound;
+  int rows = kLookedRowsPerRound;
+  std::int64_t bytes = kLookedBytesPerRound;
 
   bool isUsedUp() const { return rows <= 0 || bytes <= 0; }
   void use(std::int64_t rowBytes) {
@@ -67,11 +68,13 @@ struct RoundBudget {
 // are looked at, too, because there is no index by user: it would cost every commit another page.
 class OldestRows {
  public:
-  OldestRows(SqliteDatabase& database, const StoreTable& table, std::uint32_t user, std::int64_t from)
-      : user_(user),
-        from_(from),
-        select_(database.prepare(oldestRows(
-            table, "id, " + std::string(table.time) + ", " + std::string(table.bytes) + ", user_id"))) {
+  // `newest` is the highest identifier of the table.
+  OldestRows(SqliteDatabase& database, const StoreTable& table, std::uint32_t user, std::int64_t from,
+             std::int64_t newest)
+      : user_(user), from_(from) {
+    if (from > newest) return;
+    select_ = database.prepare(
+        oldestRows(table, "id, " + std::string(table.time) + ", " + std::string(table.bytes) + ", user_id"));
     select_.bind(1, from);
     step();
   }
@@ -126,14 +129,17 @@ class OldestRows {
   bool areOthersBetween_ = false;
 };
 
+// The highest identifiers of kStoreTables.
+using NewestIds = std::array<std::int64_t, kStoreTables.size()>;
+
 // A user whose oldest rows are deleted in one round.
 class OldestRowsOfUser {
  public:
-  OldestRowsOfUser(SqliteDatabase& database, StoreHolding& holding)
+  OldestRowsOfUser(SqliteDatabase& database, StoreHolding& holding, const NewestIds& newest)
       : holding_(&holding), left_(holding.bytes) {
     tables_.reserve(kStoreTables.size());
     for (std::size_t at = 0; at < kStoreTables.size(); ++at) {
-      tables_.emplace_back(database, kStoreTables[at], holding.user, holding.from[at]);
+      tables_.emplace_back(database, kStoreTables[at], holding.user, holding.from[at], newest[at]);
     }
   }
 
@@ -162,30 +168,45 @@ class OldestRowsOfUser {
                        [](const OldestRows& table) { return table.hasFailed(); });
   }
 
-  struct Range {
-    std::int64_t first = 0;
-    std::int64_t last = 0;
-    bool areOthersBetween = false;
+  struct Marked {
+    RowRange rows;
+    bool areOthersBetween = false;  // rows of other users, which stay or are marked, too
   };
-  // Ends the reads, so that rows can be deleted, and keeps the result. Returns the marked rows of each table.
-  std::array<Range, kStoreTables.size()> end() {
-    std::array<Range, kStoreTables.size()> ranges;
-    for (std::size_t at = 0; at < ranges.size(); ++at) {
+  // Ends the reads, so that rows can be deleted, and keeps the result.
+  void end() {
+    for (std::size_t at = 0; at < marked_.size(); ++at) {
       const OldestRows& table = tables_[at];
-      ranges[at] = {table.first(), table.passed(), table.areOthersBetween()};
+      marked_[at] = {{table.first(), table.passed()}, table.areOthersBetween()};
       holding_->from[at] = table.from();
     }
     holding_->bytes = std::max<std::int64_t>(0, left_);
     tables_.clear();
-    return ranges;
   }
+  // After end(): the marked rows of each table.
+  const std::array<Marked, kStoreTables.size()>& marked() const { return marked_; }
 
  private:
   StoreHolding* holding_;
   std::int64_t left_;
   bool isDone_ = false;
   std::vector<OldestRows> tables_;
+  std::array<Marked, kStoreTables.size()> marked_;
 };
+
+// Joins ranges that overlap.
+std::vector<RowRange> joined(std::vector<RowRange> ranges) {
+  std::sort(ranges.begin(), ranges.end(),
+            [](const RowRange& a, const RowRange& b) { return a.first < b.first; });
+  std::vector<RowRange> found;
+  for (const RowRange& range : ranges) {
+    if (found.empty() || range.first > found.back().last) {
+      found.push_back(range);
+    } else {
+      found.back().last = std::max(found.back().last, range.last);
+    }
+  }
+  return found;
+}
 
 }  // namespace
 
@@ -195,7 +216,12 @@ StoreTrimmer::StoreTrimmer(SqliteDatabase& database, StoreHoldings& holdings)
     : database_(database),
       holdings_(holdings),
       countPages_(database.prepare("PRAGMA page_count")),
-      countFreePages_(database.prepare("PRAGMA freelist_count")) {}
+      countFreePages_(database.prepare("PRAGMA freelist_count")) {
+  for (std::size_t at = 0; at < newestIds_.size(); ++at) {
+    newestIds_[at] =
+        database.prepare("SELECT coalesce(max(id), 0) FROM " + std::string(kStoreTables[at].name));
+  }
+}
 
 StoreTrimmer::Outcome StoreTrimmer::trimAge(const StoreBounds& bounds, double now) {
   for (int round = 0; round < kRoundsPerSlice; ++round) {
@@ -315,6 +341,12 @@ std::optional<bool> StoreTrimmer::emptyNewest(std::int64_t maxBytes) {
 // user who then holds the most. Returns the number of rows that it has looked at, or a negative number on
 // failure.
 std::int64_t StoreTrimmer::deleteOldest(std::int64_t bytes) {
+  NewestIds newest{};
+  for (std::size_t at = 0; at < newest.size(); ++at) {
+    const auto found = newestIds_[at].firstNumber();
+    if (!found) return -1;
+    newest[at] = *found;
+  }
   std::vector<OldestRowsOfUser> users;
   RoundBudget budget;
   while (bytes > 0 && !budget.isUsedUp()) {
@@ -338,7 +370,7 @@ std::int64_t StoreTrimmer::deleteOldest(std::int64_t bytes) {
       added = &holding;
     }
     if (most == 0) break;
-    if (largest == nullptr) largest = &users.emplace_back(database_, *added);
+    if (largest == nullptr) largest = &users.emplace_back(database_, *added, newest);
     while (bytes > 0 && largest->left() >= second) {
       const std::int64_t passed = largest->pass(budget);
       if (passed == 0) break;
@@ -350,29 +382,27 @@ std::int64_t StoreTrimmer::deleteOldest(std::int64_t bytes) {
     return -1;
   }
   // All reads end before the first row is deleted.
-  std::vector<std::array<OldestRowsOfUser::Range, kStoreTables.size()>> ranges;
-  ranges.reserve(users.size());
-  for (OldestRowsOfUser& user : users) ranges.push_back(user.end());
-  for (std::size_t user = 0; user < users.size(); ++user) {
-    for (std::size_t at = 0; at < kStoreTables.size(); ++at) {
-      const OldestRowsOfUser::Range& range = ranges[user][at];
-      if (range.first == 0) continue;
-      const std::uint32_t number = users[user].holding().user;
-      const bool isDeleted = range.areOthersBetween
-                                 ? deleteBetweenOthers(kStoreTables[at], number, range.first, range.last)
-                                 : deleteRows(kStoreTables[at], number, range.first, range.last);
-      if (!isDeleted) return -1;
+  for (OldestRowsOfUser& user : users) user.end();
+  for (std::size_t at = 0; at < kStoreTables.size(); ++at) {
+    std::vector<RowRange> mixed;
+    for (const OldestRowsOfUser& user : users) {
+      const OldestRowsOfUser::Marked& marked = user.marked()[at];
+      if (marked.rows.first == 0) continue;
+      if (!deleteRows(kStoreTables[at], user.holding().user, marked.rows)) return -1;
+      if (marked.areOthersBetween) mixed.push_back(marked.rows);
+    }
+    for (const RowRange& range : joined(std::move(mixed))) {
+      if (!closeGaps(kStoreTables[at], range)) return -1;
     }
   }
-  return kRowsPerRound - budget.rows;
+  return kLookedRowsPerRound - budget.rows;
 }
 
-bool StoreTrimmer::deleteRows(const StoreTable& table, std::uint32_t user, std::int64_t first,
-                              std::int64_t last) {
+bool StoreTrimmer::deleteRows(const StoreTable& table, std::uint32_t user, const RowRange& rows) {
   SqliteStatement statement = database_.prepare("DELETE FROM " + std::string(table.name) +
                                                 " WHERE id BETWEEN ?1 AND ?2 AND user_id IS ?3");
-  statement.bind(1, first);
-  statement.bind(2, last);
+  statement.bind(1, rows.first);
+  statement.bind(2, rows.last);
   bindUser(statement, 3, user);
   return statement.run();
 }
@@ -381,28 +411,26 @@ bool StoreTrimmer::deleteRows(const StoreTable& table, std::uint32_t user, std::
 // two thirds of them are empty. The others' rows would then take up to three times their bytes and, although
 // few, the room of everybody. So they are written again, close together. Each row is written again at most
 // once for each other user.
-bool StoreTrimmer::deleteBetweenOthers(const StoreTable& table, std::uint32_t user, std::int64_t first,
-                                       std::int64_t last) {
+bool StoreTrimmer::closeGaps(const StoreTable& table, const RowRange& rows) {
   const std::string name = "main." + std::string(table.name);
   const std::string kept = "temp.kept_" + std::string(table.name);
-  const std::string isSmall = std::string(table.bytes) + " < " + std::to_string(kSmallRowBytes);
+  const std::string isMoved =
+      " WHERE id BETWEEN ?1 AND ?2 AND " + std::string(table.bytes) + " < " + std::to_string(kSmallRowBytes);
   if (!database_.run("BEGIN IMMEDIATE; CREATE TABLE IF NOT EXISTS " + kept + " AS SELECT * FROM " + name +
                      " WHERE false")) {
     return false;
   }
-  const std::array<std::string, 2> steps{
-      "INSERT INTO " + kept + " SELECT * FROM " + name +
-          " WHERE id BETWEEN ?1 AND ?2 AND user_id IS NOT ?3 AND " + isSmall + " ORDER BY id",
-      "DELETE FROM " + name + " WHERE id BETWEEN ?1 AND ?2 AND (user_id IS ?3 OR " + isSmall + ")"};
-  for (const std::string& sql : steps) {
-    SqliteStatement statement = database_.prepare(sql);
-    statement.bind(1, first);
-    statement.bind(2, last);
-    bindUser(statement, 3, user);
-    if (!statement.run()) return false;
-  }
-  return database_.run("INSERT INTO " + name + " SELECT * FROM " + kept + "; DELETE FROM " + kept +
-                       "; COMMIT");
+  SqliteStatement copy =
+      database_.prepare("INSERT INTO " + kept + " SELECT * FROM " + name + isMoved + " ORDER BY id");
+  copy.bind(1, rows.first);
+  copy.bind(2, rows.last);
+  if (!copy.run()) return false;
+  if (database_.changes() == 0) return database_.run("COMMIT");
+  SqliteStatement remove = database_.prepare("DELETE FROM " + name + isMoved);
+  remove.bind(1, rows.first);
+  remove.bind(2, rows.last);
+  return remove.run() && database_.run("INSERT INTO " + name + " SELECT * FROM " + kept + "; DELETE FROM " +
+                                       kept + "; COMMIT");
 }
 
 }  // namespace tonewerk

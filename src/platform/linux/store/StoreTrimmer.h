@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <array>
 #include <cstdint>
 #include <optional>
 
@@ -19,6 +20,12 @@ struct StoreBounds {
   std::int64_t fileBytes() const { return bytes - walBytes(); }
 
   friend bool operator==(const StoreBounds&, const StoreBounds&) = default;
+};
+
+// The rows of a table with these identifiers and those between them. `first` is 0 when there are none.
+struct RowRange {
+  std::int64_t first = 0;
+  std::int64_t last = 0;
 };
 
 // Keeps an open report store within its bounds: deletes the oldest rows of all tables and gives pages back to
@@ -52,10 +59,8 @@ class StoreTrimmer {
   [[nodiscard]] bool measure();
   [[nodiscard]] std::int64_t deleteUpTo(double time);
   [[nodiscard]] std::int64_t deleteOldest(std::int64_t bytes);
-  [[nodiscard]] bool deleteRows(const StoreTable& table, std::uint32_t user, std::int64_t first,
-                                std::int64_t last);
-  [[nodiscard]] bool deleteBetweenOthers(const StoreTable& table, std::uint32_t user, std::int64_t first,
-                                         std::int64_t last);
+  [[nodiscard]] bool deleteRows(const StoreTable& table, std::uint32_t user, const RowRange& rows);
+  [[nodiscard]] bool closeGaps(const StoreTable& table, const RowRange& rows);
   [[nodiscard]] std::optional<bool> emptyNewest(std::int64_t maxBytes);
 
   SqliteDatabase& database_;
@@ -63,6 +68,7 @@ class StoreTrimmer {
   // Used after every batch, so they are prepared once.
   SqliteStatement countPages_;
   SqliteStatement countFreePages_;
+  std::array<SqliteStatement, kStoreTables.size()> newestIds_;
   std::int64_t pageBytes_ = 0;
   std::int64_t pages_ = 0;
   std::int64_t freePages_ = 0;
