@@ -10,8 +10,8 @@ namespace tonewerk {
 // terminals. No byte of such a text may end a line or control a terminal.
 //
 // Two places have other rules. Text that goes into JSON, TOML or Markdown is escaped there and loses nothing.
-// The tool's printable() also replaces the control characters of two bytes, because only the tool writes to a
-// terminal.
+// In the log and in what the tool prints, printable() (values/PrintableText.h) escapes it, together with the
+// control characters beyond ASCII.
 
 // True for an ASCII control character: below a space, or DEL.
 inline bool isControlCharacter(char byte) { return static_cast<unsigned char>(byte) < ' ' || byte == '\x7F'; }

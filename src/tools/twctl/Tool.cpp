@@ -7,6 +7,7 @@
 #include <unistd.h>
 
 #include "platform/linux/directories/SocketPaths.h"
+#include "values/PrintableText.h"
 
 namespace tonewerk {
 namespace {
@@ -20,13 +21,13 @@ std::optional<std::string> variable(const std::string& name) {
 
 int Tool::fail(ExitStatus failure, std::string_view problem) const {
   out.flush();
-  err << "twctl: " << problem << '\n';
+  err << "twctl: " << printable(std::string(problem)) << '\n';
   return failure;
 }
 
 void Tool::warn(std::string_view problem) const {
   out.flush();
-  err << "twctl: warning: " << problem << '\n';
+  err << "twctl: warning: " << printable(std::string(problem)) << '\n';
 }
 
 Directories Tool::directories() const {

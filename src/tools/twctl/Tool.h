@@ -32,7 +32,8 @@ struct Tool {
   int outDescriptor = -1;  // the descriptor of `out`; -1 when it is not a file
   int status = kDone;      // the exit status of the command that ran
 
-  // Prints "twctl: <problem>" and returns `failure`.
+  // Prints "twctl: <problem>" and returns `failure`. Escapes what the problem repeats of other programs' and
+  // users' words.
   [[nodiscard]] int fail(ExitStatus failure, std::string_view problem) const;
   // Prints "twctl: warning: <problem>", for a problem that did not stop the command.
   void warn(std::string_view problem) const;

@@ -140,6 +140,13 @@ TEST_F(CommandLineTest, SaysInOneLineWhatIsWrong) {
   }
 }
 
+TEST_F(CommandLineTest, RepeatsNoWordThatControlsATerminal) {
+  EXPECT_EQ(run({"ev\x1b[2J\n\xE2\x80\xAE\x7F"}), kWrongUsage);
+  EXPECT_EQ(errors(), "twctl: unknown command 'ev\\u001b[2J\\n\\u202e\\u007f'\n");
+  EXPECT_EQ(run({"replay", "/nowhere/\xC2\x9B"}), kWrongUsage);
+  EXPECT_THAT(errors(), HasSubstr("/nowhere/\\u009b: "));
+}
+
 TEST_F(CommandLineTest, PrintsPaths) {
   EXPECT_EQ(run({"paths", "store"}), kDone);
   EXPECT_EQ(output(), directory_.path("state/reports.db") + "\n");
@@ -401,6 +408,21 @@ TEST_F(EventsCommandTest, GivesEventsToPrograms) {
             "{\"id\":6,\"recorded_at\":1763633900.0,\"name\":\"com.orvane.a\",\"payload\":{\"n\":3}}\n");
 }
 
+TEST_F(EventsCommandTest, PrintsNothingThatControlsATerminal) {
+  {
+    MemoryLog log;
+    const LogCategory category(log, "com.orvane.tonewerk", "twrs");
+    const MemoryPreferenceStore preferences;
+    ManualClock clock;
+    ReportStore store(directory_.path("state"), json_, preferences, clock, category);
+    store.recordEvent(1'763'633'880.0, "com.orvane.a\x1b\n", {{"k\x7F", "v\xC2\x9B\xE2\x80\xAE"}});
+  }
+  EXPECT_EQ(run({"events"}), kDone);
+  EXPECT_THAT(output(), HasSubstr(R"(  com.orvane.a\u001b\n  {"k\u007f":"v\u009b\u202e"})"));
+  EXPECT_EQ(run({"events", "--json"}), kDone);
+  EXPECT_THAT(output(), HasSubstr(R"("name":"com.orvane.a\u001b\n","payload":{"k\u007f":"v\u009b\u202e"}})"));
+}
+
 TEST_F(EventsCommandTest, TakesTimes) {
   store();
   EXPECT_EQ(
@@ -508,6 +530,26 @@ TEST_F(PowerCommandTest, ShowsEventsAndTheTotalsOfTheirDurationsToPeople) {
             "chat             7                 1\n"
             "game             2                 1\n"
             "(null)           0.25              1\n");
+}
+
+TEST_F(PowerCommandTest, PrintsNothingThatControlsATerminal) {
+  {
+    MemoryLog log;
+    const LogCategory category(log, "com.orvane.tonewerk", "twrs");
+    const MemoryPreferenceStore preferences;
+    ManualClock clock;
+    ReportStore store(directory_.path("state"), json_, preferences, clock, category);
+    store.record(PowerRow{1'763'633'880.0,
+                          28,
+                          "Flumen_Haptics_EngineOnDuration",
+                          {{"EngineOnDuration", 2}, {"ApplicationName", "g\x1b]0;\x7F\xE2\x80\xAE\n"}}});
+  }
+  const std::string name = R"(g\u001b]0;\u007f\u202e\n)";
+  EXPECT_EQ(run({"power"}), kDone);
+  EXPECT_THAT(output(),
+              AllOf(HasSubstr("\"ApplicationName\":\"" + name + "\""), HasSubstr("\n" + name + "  2 ")));
+  EXPECT_EQ(run({"power", "--totals", "--json"}), kDone);
+  EXPECT_THAT(output(), HasSubstr("{\"ApplicationName\":\"" + name + "\","));
 }
 
 TEST_F(PowerCommandTest, ShowsNoTotalsWhereNoEventHasADuration) {

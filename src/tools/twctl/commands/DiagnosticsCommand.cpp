@@ -13,6 +13,7 @@
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/show/DiagnosticSummary.h"
 #include "tools/twctl/show/Table.h"
+#include "values/PrintableText.h"
 #include "values/ShortenedText.h"
 
 namespace tonewerk {
@@ -59,7 +60,7 @@ void list(Tool& tool, const DiagnosticsCommand& command) {
 }
 
 void printField(std::ostream& out, const char* name, const std::string& value) {
-  if (!value.empty()) out << "  " << std::left << std::setw(10) << name << value << '\n';
+  if (!value.empty()) out << "  " << std::left << std::setw(10) << name << printable(value) << '\n';
 }
 
 // The beginning of a text that fits on a screen, cut between characters.
@@ -83,7 +84,7 @@ void printForPeople(std::ostream& out, const DiagnosticsDirectory& directory,
                     const DiagnosticsCommand& command, const std::string& name,
                     const std::optional<std::string>& request) {
   const auto summary = DiagnosticSummary::read(command.kind, request.value_or(""));
-  out << command.noun << ' ' << name << '\n';
+  out << command.noun << ' ' << printable(name) << '\n';
   if (summary) {
     printSummary(out, *summary);
   } else {

@@ -17,6 +17,7 @@
 #include "tools/twctl/input/ValueArguments.h"
 #include "tools/twctl/show/SessionRates.h"
 #include "tools/twctl/show/TopFrame.h"
+#include "values/PrintableText.h"
 
 namespace tonewerk {
 namespace {
@@ -91,7 +92,7 @@ std::optional<std::vector<ValueMap>> listSessions(Ask ask) {
 
 void printFrame(const Tool& tool, const std::vector<SessionRow>& rows) {
   if (tool.asJson) {
-    for (const SessionRow& row : rows) tool.out << topObject(row).text() << '\n';
+    for (const SessionRow& row : rows) tool.out << printable(topObject(row).text()) << '\n';
   } else {
     for (const std::string& line : topFrame(rows, std::nullopt)) tool.out << line << '\n';
   }

@@ -7,8 +7,8 @@
 
 #include "tools/twctl/Tool.h"
 #include "tools/twctl/show/ChannelText.h"
-#include "tools/twctl/show/PrintableText.h"
 #include "tools/twctl/show/Table.h"
+#include "values/PrintableText.h"
 
 namespace tonewerk {
 namespace {
@@ -20,9 +20,7 @@ bool fitsPattern(const std::optional<std::string>& pattern, const std::optional<
   return !pattern || fnmatch(pattern->c_str(), std::string(text.value_or("")).c_str(), 0) == 0;
 }
 
-Table::Cell shown(const std::optional<std::string_view>& text) {
-  return Value(printable(std::string(text.value_or(""))));
-}
+Table::Cell shown(const std::optional<std::string_view>& text) { return Value(text.value_or("")); }
 
 }  // namespace
 
@@ -75,7 +73,7 @@ std::size_t ChannelPrinter::print(const ChanmeterSamples& samples, std::optional
     ValueMap line;
     if (changedAt) line.set("at", *changedAt);
     line.merge(channelFields(sample));
-    tool_.out << line.text() << '\n';
+    tool_.out << printable(line.text()) << '\n';
     return 0;
   });
   return count;

@@ -7,7 +7,6 @@
 #include <optional>
 
 #include "platform/Chanmeter.h"
-#include "tools/twctl/show/PrintableText.h"
 
 namespace tonewerk {
 namespace {
@@ -56,9 +55,8 @@ std::string stateText(const ChanmeterSample& sample) {
   std::string list;
   for (std::int32_t index = 0; index < sample.stateCount(); ++index) {
     if (sample.stateResidency(index) == 0 && sample.stateInTransitions(index) == 0) continue;
-    append(list, printable(std::string(sample.stateName(index))) + ": " +
-                     std::to_string(sample.stateResidency(index)) + " (" +
-                     Value(std::round(sample.stateDutyCycle(index) * 1000) / 10).text() + " %)");
+    append(list, std::string(sample.stateName(index)) + ": " + std::to_string(sample.stateResidency(index)) +
+                     " (" + Value(std::round(sample.stateDutyCycle(index) * 1000) / 10).text() + " %)");
   }
   return list.empty() ? "-" : list;
 }

@@ -4,7 +4,7 @@
 #include <initializer_list>
 #include <nlohmann/json.hpp>
 
-#include "tools/twctl/show/PrintableText.h"
+#include "values/PrintableText.h"
 
 namespace tonewerk {
 namespace {

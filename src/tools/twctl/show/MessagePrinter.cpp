@@ -7,7 +7,7 @@
 #include "protocol/EventTexts.h"
 #include "protocol/WatchKeys.h"
 #include "tools/twctl/Tool.h"
-#include "tools/twctl/show/PrintableText.h"
+#include "values/PrintableText.h"
 
 namespace tonewerk {
 namespace {
@@ -48,7 +48,7 @@ ValueMap objectOf(const ValueMap& message) {
 }  // namespace
 
 void MessagePrinter::print(const ValueMap& message) const {
-  tool_.out << (tool_.asJson ? objectOf(message).text() : printable(lineOf(message))) << '\n';
+  tool_.out << printable(tool_.asJson ? objectOf(message).text() : lineOf(message)) << '\n';
 }
 
 void MessagePrinter::printMissed(std::uint64_t count) const {

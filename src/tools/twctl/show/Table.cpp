@@ -6,6 +6,7 @@
 #include <utility>
 
 #include "values/CompactJson.h"
+#include "values/PrintableText.h"
 #include "values/Utf8.h"
 
 namespace tonewerk {
@@ -33,15 +34,15 @@ Table::~Table() { print(); }
 void Table::add(std::vector<Cell> cells) {
   if (asJson_) {
     for (std::size_t at = 0; at < columns_.size(); ++at) {
-      out_ << (at == 0 ? '{' : ',') << jsonOf(Value(columns_[at])) << ':' << cells[at].json;
+      out_ << (at == 0 ? '{' : ',') << jsonOf(Value(columns_[at])) << ':' << printable(cells[at].json);
     }
     out_ << "}\n";
     return;
   }
   std::vector<std::string> texts;
   for (std::size_t at = 0; at < columns_.size(); ++at) {
-    widths_[at] = std::max(widths_[at], utf8Characters(cells[at].text));
-    texts.push_back(std::move(cells[at].text));
+    texts.push_back(printable(std::move(cells[at].text)));
+    widths_[at] = std::max(widths_[at], utf8Characters(texts.back()));
   }
   rows_.push_back(std::move(texts));
   if (rows_.size() >= kPortion) print();

@@ -10,7 +10,8 @@
 
 namespace tonewerk {
 
-// Prints rows: in columns for people, or as one JSON object per line for programs.
+// Prints rows: in columns for people, or as one JSON object per line for programs. Escapes whatever a cell
+// holds that could end the line or control the terminal (values/PrintableText.h).
 class Table {
  public:
   // `columns` are the headings of the columns and the keys of the objects.

@@ -8,7 +8,6 @@
 #include <utility>
 
 #include "protocol/WatchKeys.h"
-#include "tools/twctl/show/PrintableText.h"
 #include "tools/twctl/show/Table.h"
 #include "values/Utf8.h"
 
@@ -37,8 +36,6 @@ std::string runningTimeOf(const ValueMap& session) {
   const Value* seconds = session.find(kWatchKeySeconds);
   return seconds == nullptr ? "-" : runningTime(seconds->number());
 }
-
-Value cell(std::string text) { return printable(std::move(text)); }
 
 std::string summaryOf(const std::vector<SessionRow>& rows) {
   double sum = 0;
@@ -99,8 +96,8 @@ std::vector<std::string> topFrame(const std::vector<SessionRow>& rows,
     for (std::size_t at = 0; at < shown; ++at) {
       const ValueMap& session = rows[at].session;
       const auto& rate = rows[at].messagesPerSecond;
-      table.add({Value(session.integer(kWatchKeyReporterID)), cell(session.text(kWatchKeyServiceName)),
-                 cell(session.text(kWatchKeyApplication)), cell(clientOf(session)),
+      table.add({Value(session.integer(kWatchKeyReporterID)), Value(session.text(kWatchKeyServiceName)),
+                 Value(session.text(kWatchKeyApplication)), Value(clientOf(session)),
                  Value(rate ? withDecimal(*rate) : "-"), Value(shareOf(rows[at])),
                  Value(runningTimeOf(session))});
     }

@@ -215,8 +215,8 @@ TEST(DiagnosticSummaryTest, LetsNothingMoveTheCursor) {
       DiagnosticKind::kWhirlcap,
       "{\"description\": \"a\\u001b[2J\\u009bb\\nc\\u007f\", \"payload\": {\"\\u009b\": 1}}");
   ASSERT_TRUE(summary);
-  EXPECT_EQ(summary->process, "a?[2J?b?c?");
-  EXPECT_EQ(summary->payload, "{\"?\":1}");
+  EXPECT_EQ(summary->process, "a\\u001b[2J\\u009bb\\nc\\u007f");
+  EXPECT_EQ(summary->payload, "{\"\\u009b\":1}");
 }
 
 TEST(DiagnosticSummaryTest, ReadsTheFieldsThatExist) {

@@ -99,6 +99,17 @@ TEST_F(WatchCommandsTest, TopPrintsAnObjectASessionForPrograms) {
             "{\"reporterID\":77,\"messagesPerSecond\":0.0}\n{\"reporterID\":78,\"messagesPerSecond\":0.0}\n");
 }
 
+TEST_F(WatchCommandsTest, TopPrintsNothingThatControlsATerminal) {
+  answerSessions({ValueMap{{"reporterID", 77},
+                           {"serviceName", "s\n"},
+                           {"application", "a\x1b[2J\xE2\x80\xAE"},
+                           {"processName", "p\xC2\x9B\x7F"}}});
+  EXPECT_EQ(run({"top", "--interval", "0.05"}), kDone);
+  EXPECT_THAT(out.str(), HasSubstr(R"(s\n      a\u001b[2J\u202e  p\u009b\u007f )"));
+  EXPECT_EQ(run({"top", "--json", "--interval", "0.05"}), kDone);
+  EXPECT_THAT(out.str(), HasSubstr(R"("application":"a\u001b[2J\u202e","processName":"p\u009b\u007f")"));
+}
+
 TEST_F(WatchCommandsTest, TopAsksForThePortionsThatAreLeft) {
   daemon.answer("watch.sessions",
                 ValueMap{{"total", 3}, {"sessions", ValueArray{ValueMap{{"reporterID", 7}}}}});

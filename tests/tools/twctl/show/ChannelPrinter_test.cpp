@@ -175,11 +175,13 @@ TEST_F(ChannelPrinterTest, SendsNoControlCharactersToATerminal) {
   chanmeter_.setRecords({simple(keyIn("g\x1b[2J", "n\xC2\x9B", "d\n\x7F"), 1),
                          states(keyIn("g", "Überlauf"), {{"\x1b", 1, 1, 1}})});
   const std::string shown = values();
-  EXPECT_THAT(shown, HasSubstr("d??"));
-  EXPECT_THAT(shown, HasSubstr("g?[2J"));
-  EXPECT_THAT(shown, HasSubstr("n? "));
+  EXPECT_THAT(shown, HasSubstr("d\\n\\u007f"));
+  EXPECT_THAT(shown, HasSubstr("g\\u001b[2J"));
+  EXPECT_THAT(shown, HasSubstr("n\\u009b "));
   EXPECT_THAT(shown, HasSubstr("Überlauf"));
-  EXPECT_THAT(shown, HasSubstr("?: 1 (100 %)"));
+  EXPECT_THAT(shown, HasSubstr("\\u001b: 1 (100 %)"));
+  tool_.asJson = true;
+  EXPECT_THAT(values(), AllOf(HasSubstr("\"name\":\"n\\u009b\""), HasSubstr("\"driver\":\"d\\n\\u007f\"")));
 }
 
 }  // namespace

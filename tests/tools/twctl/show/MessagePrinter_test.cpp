@@ -49,12 +49,17 @@ TEST_F(MessagePrinterTest, MarksARedundantOne) {
 }
 
 TEST_F(MessagePrinterTest, MakesControlCharactersHarmless) {
-  message.set("payload", ValueMap{{"a", "b\x1b[2J\xC2\x9B\n"}});
+  message.set("payload", ValueMap{{"k\x7F", "b\x1b[2J\xC2\x9B\n"}});
+  message.set("application", "a\xE2\x80\xAE");
   printer.print(message);
-  const std::string text = printed();
-  EXPECT_EQ(text.find('\x1b'), std::string::npos);
-  EXPECT_EQ(text.find('\x9B'), std::string::npos);
-  EXPECT_EQ(text.find('\n'), text.size() - 1);
+  const std::string payload = R"({"k\u007f":"b\u001b[2J\u009b\n"})";
+  EXPECT_EQ(printed(), "2025-11-20T10:20:00.5Z  77  telephony  Playback/Start  " + payload + "\n");
+  tool.asJson = true;
+  printer.print(message);
+  EXPECT_EQ(printed(), R"({"reporterID":77,"serviceType":2,"category":4,"type":1,"redundant":false,)"
+                       R"("time":1763634000.5,"application":"a\u202e","serviceName":"telephony",)"
+                       R"("categoryName":"Playback","typeName":"Start","payload":)" +
+                           payload + "}\n");
 }
 
 TEST_F(MessagePrinterTest, SaysHowManyWereMissed) {

@@ -54,6 +54,26 @@ TEST(TableTest, GivesProgramsAnObjectALine) {
   EXPECT_EQ(out.str(), "{\"id\":1,\"text\":\"a\\\"\\n\",\"list\":[true,2.0]}\n");
 }
 
+TEST(TableTest, EscapesWhatControlsATerminalAndStaysAligned) {
+  std::ostringstream out;
+  {
+    Table table(out, false, {"a", "b"});
+    table.add({Value("x\n\x1b[2J\x7F"), {"\xC2\x9B", "null"}});
+    table.add({Value("\xE2\x80\xAE"), Value(1)});
+  }
+  EXPECT_EQ(out.str(),
+            "a                   b\n"
+            "x\\n\\u001b[2J\\u007f  \\u009b\n"
+            "\\u202e              1\n");
+}
+
+TEST(TableTest, GivesProgramsTheSameValuesWithoutWhatControlsATerminal) {
+  std::ostringstream out;
+  Table table(out, true, {"a", "b"});
+  table.add({Value("\x7F\xE2\x80\xAE"), {"", "{\"\xC2\x9B\":\"\xC3\xBC\"}"}});
+  EXPECT_EQ(out.str(), "{\"a\":\"\\u007f\\u202e\",\"b\":{\"\\u009b\":\"\xC3\xBC\"}}\n");
+}
+
 TEST(TableTest, ShowsPeopleAndProgramsDifferentThingsWhereAsked) {
   std::ostringstream out;
   Table table(out, true, {"at"});

@@ -92,7 +92,7 @@ TEST(TopFrameTest, MakesControlCharactersHarmless) {
   evil.session.set("processName", "p\x1b");
   const auto lines = topFrame({evil}, std::nullopt);
   ASSERT_THAT(lines, SizeIs(3));
-  EXPECT_THAT(lines[2], HasSubstr("  a?[2Jb?c     p? 11  "));
+  EXPECT_THAT(lines[2], HasSubstr("  a\\u001b[2Jb\\nc  p\\u001b 11  "));
 }
 
 TEST(TopFrameTest, GivesProgramsEverything) {
