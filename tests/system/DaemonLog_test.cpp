@@ -5,6 +5,7 @@
 #include <set>
 #include <sstream>
 #include <string>
+#include <sys/prctl.h>
 #include <vector>
 
 #include "system/support/DaemonTest.h"
@@ -65,6 +66,16 @@ TEST_F(DaemonLogTest, EveryLineHasTimeLevelCategoryAndPlace) {
     EXPECT_TRUE(std::regex_match(line, kLine)) << line;
   }
   EXPECT_GT(count, 20U);
+}
+
+TEST_F(DaemonLogTest, TheNameOfAClientsProcessBeginsNoLine) {
+  char before[16] = {};
+  ::prctl(PR_GET_NAME, before);
+  ::prctl(PR_SET_NAME, "a\nforged\x1b[2J");
+  runWith("debug");
+  ::prctl(PR_SET_NAME, before);
+  EXPECT_GT(logLinesWith("a\\nforged\\u001b[2J"), 0U);
+  for (const std::string& line : linesIn(daemon.log())) EXPECT_TRUE(std::regex_match(line, kLine)) << line;
 }
 
 TEST_F(DaemonLogTest, TheThresholdIsChosenByTheVariable) {

@@ -4,6 +4,7 @@
 #include <filesystem>
 #include <string>
 #include <unistd.h>
+#include <utility>
 
 #include "platform/Log.h"
 #include "platform/accounts/Accounts.h"
@@ -19,6 +20,7 @@
 #include "platform/linux/json/JsonBenchfile.h"
 #include "platform/linux/json/NlohmannJsonService.h"
 #include "platform/linux/log/CondensingLog.h"
+#include "platform/linux/log/EscapingLog.h"
 #include "platform/linux/log/RecentLines.h"
 #include "platform/linux/log/RememberingLog.h"
 #include "platform/linux/log/StandardLog.h"
@@ -54,6 +56,14 @@ std::string temporaryDirectory() {
   return error ? "/tmp" : path.string();
 }
 
+// A line takes the way from below to above: whatever is written or kept is escaped.
+std::unique_ptr<Log> makeLog(const Clock& clock, const std::shared_ptr<RecentLines>& recentLines) {
+  std::unique_ptr<Log> log = makeStandardLog(clock);
+  log = std::make_unique<RememberingLog>(std::move(log), recentLines, clock);
+  log = std::make_unique<CondensingLog>(std::move(log), clock);
+  return std::make_unique<EscapingLog>(std::move(log));
+}
+
 }  // namespace
 
 struct LinuxPlatform::Adapters {
@@ -70,8 +80,7 @@ struct LinuxPlatform::Adapters {
   SystemClock clock;
   Accounts accounts{::geteuid(), clock};
   const std::shared_ptr<RecentLines> logLines = std::make_shared<RecentLines>();
-  std::unique_ptr<Log> log = std::make_unique<CondensingLog>(
-      std::make_unique<RememberingLog>(makeStandardLog(clock), logLines, clock), clock);
+  std::unique_ptr<Log> log = makeLog(clock, logLines);
   LogCategory category{*log, "com.orvane.tonewerk", "twrs"};  // the adapters' own lines
   UsdtTracePoints tracePoints;
   ThreadQueueFactory queues;

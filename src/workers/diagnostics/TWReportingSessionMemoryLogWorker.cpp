@@ -11,6 +11,7 @@
 
 #include "platform/DetachedThreads.h"
 #include "platform/Log.h"
+#include "platform/LogLines.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingDefaults.h"
 #include "session/TWReportingSession.h"
@@ -120,6 +121,7 @@ bool TWReportingSessionMemoryLogWorker::handleMessage(const TWReportingSessionMe
 
 void TWReportingSessionMemoryLogWorker::writeBlocks(std::string_view text) {
   const LogCategory& category = *TWReportingSessionCategory();
+  const LogLines lines;
   std::size_t number = 1;
   bool hasLineEnds = true;
   while (!text.empty()) {

@@ -15,9 +15,9 @@ namespace tonewerk {
 //
 //   2026-11-20T10:18:00.123456Z info twrr        TWReportingSession:214   start called. reporterID=77
 //
-// A line is one write() if the file takes it whole, so that lines of several processes do not mix. A message
-// with newlines is written unchanged. The process must ignore SIGPIPE if the file may be a pipe without a
-// reader.
+// A line is one write() if the file takes it whole, so that lines of several processes do not mix. Newlines
+// are written as they are; EscapingLog escapes those that the daemon did not put there. The process must
+// ignore SIGPIPE if the file may be a pipe without a reader.
 class StreamLog final : public Log {
  public:
   // Does not close `fileDescriptor`. `clock` outlives the log.

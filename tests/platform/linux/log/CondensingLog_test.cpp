@@ -9,6 +9,7 @@
 #include <thread>
 #include <vector>
 
+#include "support/ForwardingLog.h"
 #include "support/manual/ManualClock.h"
 #include "support/memory/MemoryLog.h"
 
@@ -24,22 +25,6 @@ using ::testing::SizeIs;
 
 constexpr int kMost = CondensingLog::kMaxEqualLines;
 
-// Lets a CondensingLog own a log that outlives it.
-class Forwarding final : public Log {
- public:
-  explicit Forwarding(Log& log) : log_(log) {}
-  bool isEnabled(std::string_view category, LogLevel level) const override {
-    return log_.isEnabled(category, level);
-  }
-  void write(std::string_view subsystem, std::string_view category, LogLevel level,
-             std::string_view message) override {
-    log_.write(subsystem, category, level, message);
-  }
-
- private:
-  Log& log_;
-};
-
 class CondensingLogTest : public ::testing::Test {
  protected:
   void write(const std::string& message, int times = 1, LogLevel level = LogLevel::kDefault,
@@ -54,7 +39,7 @@ class CondensingLogTest : public ::testing::Test {
 
   MemoryLog inner;
   ManualClock clock;
-  std::optional<CondensingLog> log{std::in_place, std::make_unique<Forwarding>(inner), clock};
+  std::optional<CondensingLog> log{std::in_place, std::make_unique<ForwardingLog>(inner), clock};
 };
 
 TEST_F(CondensingLogTest, PassesDifferentLinesOn) {
