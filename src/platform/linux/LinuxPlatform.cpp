@@ -21,6 +21,7 @@
 #include "platform/linux/json/NlohmannJsonService.h"
 #include "platform/linux/log/CondensingLog.h"
 #include "platform/linux/log/EscapingLog.h"
+#include "platform/linux/log/FairLog.h"
 #include "platform/linux/log/RecentLines.h"
 #include "platform/linux/log/RememberingLog.h"
 #include "platform/linux/log/StandardLog.h"
@@ -56,12 +57,14 @@ std::string temporaryDirectory() {
   return error ? "/tmp" : path.string();
 }
 
-// A line takes the way from below to above: whatever is written or kept is escaped.
+// A line takes the way from below to above: lines that are held back cost nothing more, and whatever is
+// written or kept is escaped.
 std::unique_ptr<Log> makeLog(const Clock& clock, const std::shared_ptr<RecentLines>& recentLines) {
   std::unique_ptr<Log> log = makeStandardLog(clock);
   log = std::make_unique<RememberingLog>(std::move(log), recentLines, clock);
   log = std::make_unique<CondensingLog>(std::move(log), clock);
-  return std::make_unique<EscapingLog>(std::move(log));
+  log = std::make_unique<EscapingLog>(std::move(log));
+  return std::make_unique<FairLog>(std::move(log), clock);
 }
 
 }  // namespace
