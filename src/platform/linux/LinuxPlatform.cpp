@@ -74,7 +74,7 @@ struct LinuxPlatform::Adapters {
       : logsDirectory(absolutePath(directories.logs)),
         deviceFacts(directories.configuration + "/device-facts.toml", category),
         preferences(directories.configuration + "/preferences", directories.state + "/preferences", category),
-        notifications(directories.runtime + "/notifications", category),
+        notifications(directories.runtime + "/notifications", timers, category),
         diagnostics(directories.state, makeStandardCollectors(logLines), json, preferences, clock, category,
                     {}),
         chanmeter(directories.runtime + "/channels", category) {}

@@ -19,16 +19,19 @@ const std::string& made(const std::string& directory) {
 
 }  // namespace
 
-InotifyNotificationService::InotifyNotificationService(const std::string& directory, const LogCategory& log)
+InotifyNotificationService::InotifyNotificationService(const std::string& directory, TimerService& timers,
+                                                       const LogCategory& log)
     : files_(directory),
+      pace_(timers, [this](std::string_view name) { handlers_.tell(name); }),
       watcher_(
-          made(directory), [this](std::string_view name) { handlers_.tell(name); },
-          [this] { handlers_.tellAll(); }, log) {}
+          made(directory), [this](std::string_view name) { pace_.post(name); }, [this] { pace_.postAll(); },
+          log) {}
 
 NotificationService::Registration InotifyNotificationService::registerHandler(
     std::string_view name, SerialQueue& queue, std::function<void(Token)> handler) {
   if (!NotificationHandlers::isName(name)) return {kStatusInvalidName, kNoToken};
   if (!watcher_.isWorking()) return {kStatusFailed, kNoToken};
+  pace_.add(name);
   return {kStatusOk, handlers_.add(name, queue, std::move(handler))};
 }
 
@@ -40,7 +43,11 @@ std::optional<std::uint64_t> InotifyNotificationService::state(Token token) cons
   return error == std::errc::no_such_file_or_directory ? 0 : state;
 }
 
-void InotifyNotificationService::cancel(Token token) { handlers_.remove(token); }
+void InotifyNotificationService::cancel(Token token) {
+  const std::optional<std::string> name = handlers_.nameOf(token);
+  handlers_.remove(token);
+  if (name) pace_.remove(*name);
+}
 
 void InotifyNotificationService::makeDirectory() { made(files_.directory()); }
 

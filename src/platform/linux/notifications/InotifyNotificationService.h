@@ -8,10 +8,15 @@
 #include "platform/NotificationService.h"
 #include "platform/linux/notifications/DirectoryWatcher.h"
 #include "platform/linux/notifications/NotificationFiles.h"
+#include "platform/linux/notifications/NotificationPace.h"
 
 namespace tonewerk {
 
+class TimerService;
+
 // Delivers named notifications through the files of one directory, which it watches with inotify.
+//
+// A name that is posted all the time is told ten times a second (NotificationPace.h).
 //
 // When posts may have been missed (the kernel's event queue overflowed, or the directory was replaced or
 // created again), every registered handler is called as if each name had been posted. An unnecessary call
@@ -21,8 +26,9 @@ namespace tonewerk {
 // A handler may also be called for a post from just before its registration.
 class InotifyNotificationService final : public NotificationService {
  public:
-  // Creates the directory. If that fails, it may be created later. `log` must outlive the service.
-  InotifyNotificationService(const std::string& directory, const LogCategory& log);
+  // Creates the directory. If that fails, it may be created later. `timers` and `log` must outlive the
+  // service.
+  InotifyNotificationService(const std::string& directory, TimerService& timers, const LogCategory& log);
 
   // Fails with kStatusInvalidName, or with kStatusFailed if the system has no inotify instance left.
   [[nodiscard]] Registration registerHandler(std::string_view name, SerialQueue& queue,
@@ -34,12 +40,13 @@ class InotifyNotificationService final : public NotificationService {
   // Creates the directory again, with the directories above it, after they were removed.
   void makeDirectory();
   // Calls every registered handler.
-  void callAllHandlers() { handlers_.tellAll(); }
+  void callAllHandlers() { pace_.postAll(); }
 
  private:
   const NotificationFiles files_;
   NotificationHandlers handlers_;
-  DirectoryWatcher watcher_;  // last: it calls the handlers
+  NotificationPace pace_;     // calls the handlers
+  DirectoryWatcher watcher_;  // last: it uses the pace
 };
 
 }  // namespace tonewerk

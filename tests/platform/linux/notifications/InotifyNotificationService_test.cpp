@@ -10,6 +10,7 @@
 #include <string>
 
 #include "platform/linux/threads/ThreadQueue.h"
+#include "platform/linux/threads/TimerThread.h"
 #include "support/TemporaryDirectory.h"
 #include "support/memory/MemoryLog.h"
 #include "values/Mutex.h"
@@ -57,7 +58,8 @@ class InotifyNotificationServiceTest : public ::testing::Test {
   Condition changed;
   std::map<Token, int> calls GUARDED_BY(mutex);
   ThreadQueue queue{"test", QueuePriority::kUtility};
-  InotifyNotificationService service{notifications, category};
+  TimerThread timers;
+  InotifyNotificationService service{notifications, timers, category};
 };
 
 TEST_F(InotifyNotificationServiceTest, MakesItsDirectory) { EXPECT_TRUE(fs::is_directory(notifications)); }
@@ -121,6 +123,21 @@ TEST_F(InotifyNotificationServiceTest, FilesWithoutARegistrationChangeNothing) {
   EXPECT_EQ(count(token), 1);
 }
 
+// Somebody wrote a state 60,000 times a second, and every session had a row of each.
+TEST_F(InotifyNotificationServiceTest, ANameThatIsRewrittenAllTheTimeIsToldOnceAnInterval) {
+  const Token token = registerName(kName);
+  const auto begin = std::chrono::steady_clock::now();
+  const auto end = begin + 5 * NotificationPace::kInterval;
+  std::uint64_t state = 0;
+  while (std::chrono::steady_clock::now() < end) std::ofstream(file()) << ++state << '\n';
+  std::ofstream(file()) << "41\n";
+  EXPECT_TRUE(waitForMoreThan(count(token), token));  // the last post
+  EXPECT_EQ(service.state(token), 41U);
+  const auto passed = std::chrono::steady_clock::now() - begin;
+  EXPECT_LE(count(token), passed / NotificationPace::kInterval + 2);
+  EXPECT_GT(state, 20U);
+}
+
 TEST(InotifyNotificationServiceWithoutDirectoryTest, WorksAfterTheDirectoryIsCreated) {
   const TemporaryDirectory directory;
   std::ofstream(directory.path("runtime")) << "a file in the way";
@@ -130,7 +147,8 @@ TEST(InotifyNotificationServiceWithoutDirectoryTest, WorksAfterTheDirectoryIsCre
   std::mutex mutex;
   std::condition_variable changed;
   bool isCalled = false;
-  InotifyNotificationService service(directory.path("runtime/notifications"), category);
+  TimerThread timers;
+  InotifyNotificationService service(directory.path("runtime/notifications"), timers, category);
   const auto registration = service.registerHandler(kName, queue, [&](Token) {
     {
       const std::lock_guard lock(mutex);

@@ -13,6 +13,7 @@
 #include "platform/linux/notifications/InotifyNotificationService.h"
 #include "platform/linux/notifications/NotificationFiles.h"
 #include "platform/linux/threads/ThreadQueue.h"
+#include "platform/linux/threads/TimerThread.h"
 #include "support/TemporaryDirectory.h"
 #include "support/memory/MemoryLog.h"
 #include "support/memory/MemoryNotificationService.h"
@@ -30,7 +31,8 @@ struct OnFiles {
   TemporaryDirectory directory;
   MemoryLog log;
   LogCategory category{log, "com.orvane.tonewerk", "twrs"};
-  InotifyNotificationService service{directory.path("notifications"), category};
+  TimerThread timers;
+  InotifyNotificationService service{directory.path("notifications"), timers, category};
 
   std::error_code post(std::string_view name, std::uint64_t state) {
     return NotificationFiles(directory.path("notifications")).post(name, state);
@@ -284,7 +286,9 @@ TYPED_TEST(NotificationServiceContract, ManyPostsWaitAsOnePieceOfWork) {
   this->postAndWait(kOther, marker);  // all earlier posts have been handled
   release.set_value();
   this->queue_.drain();
-  EXPECT_EQ(this->valueOf(calls), 1);
+  // Posts that an implementation tells later may come after the release.
+  EXPECT_GE(this->valueOf(calls), 1);
+  EXPECT_LE(this->valueOf(calls), 2);
 }
 
 }  // namespace
