@@ -77,6 +77,28 @@ TEST_F(RtcCommandTest, ShowsSessionsAndThenMessagesToPeople) {
   EXPECT_THAT(output(), HasSubstr(R"({"of":"vocia"})"));
 }
 
+TEST_F(RtcCommandTest, PrintsNothingThatControlsATerminal) {
+  {
+    ManualClock clock;
+    MemoryLog log;
+    const LogCategory category(log, "com.orvane.tonewerk", "twrs");
+    const MemoryPreferenceStore preferences;
+    ReportStore store(directory_.path("state"), json_, preferences, clock, category);
+    auto session = std::make_shared<RtcSessionRecord>();
+    session->startedAt = clock.now();
+    session->sessionInfo = {{"id\x7F", "a\x1b\n"}};
+    session->userInfo = {{"kLinkReportUserInfoServiceName", "s\xC2\x9B"}};
+    store.record(RtcSessionRow{session});
+    store.record(RtcMessageRow{clock.now(), session, 4, 65535, {{"k\xE2\x80\xAE", "\xE2\x80\xA8"}}});
+    ASSERT_TRUE(store.flush(std::chrono::seconds(30)));
+  }
+  for (const std::vector<const char*>& arguments : {std::vector{"rtc"}, std::vector{"rtc", "--json"}}) {
+    EXPECT_EQ(run(arguments), kDone);
+    EXPECT_THAT(output(), AllOf(HasSubstr(R"({"id\u007f":"a\u001b\n"})"), HasSubstr(R"("s\u009b")"),
+                                HasSubstr(R"({"k\u202e":"\u2028"})")));
+  }
+}
+
 TEST_F(RtcCommandTest, GivesBothToPrograms) {
   fillStore();
   EXPECT_EQ(run({"rtc", "--json", "--name", "telephony*"}), kDone);
