@@ -1,11 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/NotificationHandlers.h"
 
+#include <algorithm>
 #include <atomic>
 #include <limits>
 #include <utility>
 
 #include "platform/SerialQueue.h"
+#include "values/ControlCharacters.h"
 
 namespace tonewerk {
 
@@ -21,7 +23,8 @@ struct NotificationHandlers::Registration {
 
 bool NotificationHandlers::isName(std::string_view name) {
   return !name.empty() && name.size() <= kMaxNameBytes && name != "." && name != ".." &&
-         name.find('/') == std::string_view::npos && name.find('\0') == std::string_view::npos;
+         name.find('/') == std::string_view::npos &&
+         std::none_of(name.begin(), name.end(), isControlCharacter);
 }
 
 NotificationHandlers::~NotificationHandlers() {

@@ -34,7 +34,8 @@ class NotificationService {
   virtual ~NotificationService() = default;
 
   // Runs `handler` with the token on `queue` after every later post of `name`. A name is a file name: not
-  // empty, no slash, not "." or "..", at most 255 bytes. `queue` must outlive the registration.
+  // empty, no slash, no ASCII control character, not "." or "..", at most 255 bytes. `queue` must outlive the
+  // registration.
   [[nodiscard]] virtual Registration registerHandler(std::string_view name, SerialQueue& queue,
                                                      std::function<void(Token)> handler) = 0;
 

@@ -251,8 +251,9 @@ TYPED_TEST(NotificationServiceContract, APostDuringTheHandlerCallsItAgain) {
 }
 
 TYPED_TEST(NotificationServiceContract, NamesThatAreNotFileNamesAreRefused) {
-  for (const std::string& name : {std::string(), std::string("."), std::string(".."), std::string("a/b"),
-                                  std::string("../x"), std::string("a\0b", 3), std::string(256, 'a')}) {
+  for (const std::string& name :
+       {std::string(), std::string("."), std::string(".."), std::string("a/b"), std::string("../x"),
+        std::string("a\0b", 3), std::string("a\nb"), std::string("a\x7F"), std::string(256, 'a')}) {
     const auto registration = this->service().registerHandler(name, this->queue_, [](Token) {});
     EXPECT_EQ(registration.status, NotificationService::kStatusInvalidName) << name;
     EXPECT_EQ(registration.token, NotificationService::kNoToken);
