@@ -121,8 +121,7 @@ void DirectoryWatcher::handle(const Event& event) {
 void DirectoryWatcher::handleFile(const Event& event) {
   const std::string name(event.name);
   if ((event.what & IN_CREATE) != 0) {
-    opened_.erase(name);  // that was an earlier file with this name
-    if (holdsSomething(directory_ + "/" + name)) unopened_.insert(name);
+    noteNewFile(name);
   } else if ((event.what & IN_OPEN) != 0) {
     if (unopened_.erase(name) > 0) opened_.insert(name);
   } else if ((event.what & IN_CLOSE_NOWRITE) != 0) {
@@ -132,6 +131,16 @@ void DirectoryWatcher::handleFile(const Event& event) {
     opened_.erase(name);
     if ((event.what & IN_MODIFY) == 0) onFile_(name);  // IN_CLOSE_WRITE or IN_MOVED_TO
   }
+}
+
+void DirectoryWatcher::noteNewFile(const std::string& name) {
+  opened_.erase(name);  // that was an earlier file with this name
+  if (!holdsSomething(directory_ + "/" + name)) return;
+  unopened_.insert(name);
+  if (unopened_.size() + opened_.size() <= kMaxNewFiles) return;
+  unopened_.clear();
+  opened_.clear();
+  onEverything_();
 }
 
 void DirectoryWatcher::reportLinks() {

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <chrono>
+#include <cstddef>
 #include <functional>
 #include <set>
 #include <string>
@@ -20,6 +21,7 @@ namespace tonewerk {
 //   linked into place, and not empty                -> onFile(name)
 //   created, not yet closed after writing           -> nothing
 //   the kernel's event queue overflowed             -> onEverything()
+//   too many new files at once                      -> onEverything()
 //   the directory was created or replaced           -> onEverything()
 //
 // The kernel sends the same event for a link as for a created file. But a created file must be opened before
@@ -34,6 +36,8 @@ class DirectoryWatcher {
  public:
   using FileHandler = std::function<void(std::string_view name)>;
 
+  // As many new files are remembered until it is known whether they were linked.
+  static constexpr std::size_t kMaxNewFiles = 1024;
   static constexpr std::chrono::milliseconds kFirstRetry{1'000};
   static constexpr std::chrono::milliseconds kLastRetry{60'000};
 
@@ -57,6 +61,7 @@ class DirectoryWatcher {
   void readEvents();
   void handle(const Event& event);
   void handleFile(const Event& event);
+  void noteNewFile(const std::string& name);
   // Reports the files in unopened_. Called when the kernel's queue is empty.
   void reportLinks();
   // Replaces the watches by watches of the directories that the paths lead to now.

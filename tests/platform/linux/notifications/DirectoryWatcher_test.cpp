@@ -438,5 +438,33 @@ TEST_F(DirectoryWatcherTest, ADirectoryThatBecomesReadableIsWatched) {
   EXPECT_TRUE(waitFor("a"));
 }
 
+// The names of new files are kept until it is known what they are. Somebody who makes them without end must
+// not make the list longer without end.
+TEST_F(DirectoryWatcherTest, TooManyNewFilesAtOnceAreReportedAsEverything) {
+  fs::create_directories(watched);
+  watch();
+  write(root.path("made"));
+  hold();
+  for (std::size_t link = 0; link <= DirectoryWatcher::kMaxNewFiles; ++link) {
+    fs::create_hard_link(root.path("made"), path("link" + std::to_string(link)));
+  }
+  release();
+  EXPECT_TRUE(waitFor(kEverything));
+  EXPECT_FALSE(wasEverReported("link0"));
+}
+
+TEST_F(DirectoryWatcherTest, AsManyNewFilesAsAreRememberedAreReportedByName) {
+  fs::create_directories(watched);
+  watch();
+  write(root.path("made"));
+  hold();
+  for (std::size_t link = 0; link < DirectoryWatcher::kMaxNewFiles; ++link) {
+    fs::create_hard_link(root.path("made"), path("link" + std::to_string(link)));
+  }
+  release();
+  EXPECT_TRUE(waitFor("link0"));
+  EXPECT_FALSE(wasEverReported(kEverything));
+}
+
 }  // namespace
 }  // namespace tonewerk
