@@ -14,7 +14,6 @@ namespace tonewerk {
 namespace {
 
 using ::testing::ElementsAre;
-using ::testing::Field;
 
 class EscapingLogTest : public ::testing::Test {
  protected:

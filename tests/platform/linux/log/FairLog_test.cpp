@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/log/FairLog.h"
 
+#include <array>
 #include <chrono>
 #include <cstdint>
 #include <gmock/gmock.h>
@@ -151,9 +152,9 @@ TEST_F(FairLogTest, ClientsWhoseUserIsUnknownAreNamedSo) {
 TEST_F(FairLogTest, SeveralThreadsLoseNoCount) {
   LineAllowance few{clock, {.burst = 10, .perSecond = 0}};
   {
-    std::vector<std::jthread> threads;
-    for (int thread = 0; thread < 4; ++thread) {
-      threads.emplace_back([&] { writeFor(user, few, "a", 1000); });
+    std::array<std::jthread, 4> threads;
+    for (std::jthread& thread : threads) {
+      thread = std::jthread([&] { writeFor(user, few, "a", 1000); });
     }
   }
   log.reset();
