@@ -10,6 +10,7 @@
 #include <utility>
 
 #include "platform/DetachedThreads.h"
+#include "platform/Heartbeat.h"
 #include "platform/Log.h"
 #include "platform/LogLines.h"
 #include "session/TWReportingContext.h"
@@ -72,6 +73,7 @@ class RunningTool {
 // The second tool is started first, and its output is logged first.
 void logMemory() {
   Commands commands = toolCommands();
+  const Heartbeat::LongWork waiting(MemoryLogTool::kLimits.time);
   RunningTool second("twr-memory-1", {std::move(commands[1]), MemoryLogTool::Filter::kNone});
   RunningTool first("twr-memory-0", {std::move(commands[0]), MemoryLogTool::Filter::kMemoryLines});
   TWReportingSessionMemoryLogWorker::writeBlocks(second.result());

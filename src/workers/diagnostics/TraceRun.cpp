@@ -4,6 +4,7 @@
 #include <cassert>
 #include <utility>
 
+#include "platform/Heartbeat.h"
 #include "platform/Log.h"
 #include "platform/Semaphore.h"
 #include "session/TWReportingContext.h"
@@ -31,6 +32,7 @@ void TraceRun::requestStart() {
 
 bool TraceRun::waitForStart() {
   assert(TWReportingUtilityIsOnReportingServerQueue());
+  const Heartbeat::LongWork waiting(kStartTimeout);
   if (mTraceDispatchSemaphore_->wait(kStartTimeout)) return true;
   errorLog(TWReportingTraceCategory(), "timed out waiting for performance trace to start");
   const auto session = traceSession();
@@ -43,6 +45,7 @@ bool TraceRun::stop() {
   const auto session = traceSession();
   if (session == nullptr) return false;
   session->stopRuntrace();
+  const Heartbeat::LongWork waiting(kStopTimeout);
   if (mTraceDispatchSemaphore_->wait(kStopTimeout)) return true;
   errorLog(TWReportingTraceCategory(),
            "timed out waiting for performance trace to stop.  No bdj file wil be generated. ");

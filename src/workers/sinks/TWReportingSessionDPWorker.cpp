@@ -5,6 +5,7 @@
 #include <optional>
 
 #include "platform/Clock.h"
+#include "platform/Heartbeat.h"
 #include "platform/Log.h"
 #include "platform/NotificationService.h"
 #include "platform/WhirlcapRequest.h"
@@ -53,7 +54,10 @@ std::chrono::microseconds waitTimeOf(double microseconds) {
 
 void requestTrace(const TWReportingSessionMessage& message) {
   const Platform& platform = TWReportingContext::current().platform();
-  platform.clock.sleep(settings().waitTime);
+  {
+    const Heartbeat::LongWork waiting(settings().waitTime);
+    platform.clock.sleep(settings().waitTime);
+  }
   ValueMap payload = message.message;  // later changes of the message do not reach it
   const ValueView application = payload.view(TWReportingApplicationName);
   const Value* noName = nullptr;

@@ -9,7 +9,9 @@
 #include <utility>
 #include <vector>
 
+#include "platform/Heartbeat.h"
 #include "support/ReportingTest.h"
+#include "workers/diagnostics/MemoryLogTool.h"
 
 namespace tonewerk {
 namespace {
@@ -332,6 +334,22 @@ TEST(MemoryLogNumbering, ABlockThatIsNotWrittenHasNoNumber) {
                                                  std::string(512, 'c'));
   EXPECT_THAT(log.lines, ElementsAre("WIRED LOG BLOCK 1\n" + std::string(512, 'b'),
                                      "WIRED LOG BLOCK 2\n" + std::string(512, 'c')));
+}
+
+TEST_F(TWReportingSessionMemoryLogWorkerTest, WaitingForTheToolsIsLongWorkOfTheirTime) {
+  const auto heartbeat = std::make_shared<Heartbeat>();
+  test.commands.hold("slabtop --once");
+  auto handled = std::async(std::launch::async, [&] {
+    const Heartbeat::OnThisThread scope(heartbeat);
+    SerialQueue& queue = context->reportingServerQueue();
+    queue.async([&] { handle(); });
+    queue.drain();
+  });
+  test.commands.waitForRuns(2);
+  EXPECT_EQ(heartbeat->read().allowance, MemoryLogTool::kLimits.time);
+  test.commands.release("slabtop --once");
+  handled.get();
+  EXPECT_EQ(heartbeat->read().allowance, std::chrono::seconds(0));
 }
 
 }  // namespace

@@ -4,6 +4,7 @@
 #include <cerrno>
 #include <gmock/gmock.h>
 
+#include "platform/Heartbeat.h"
 #include "support/ReportingTest.h"
 
 namespace tonewerk {
@@ -506,6 +507,20 @@ TEST_F(TWReportingSessionTraceWorkerTest, AProbeWithoutIntervalsAddsNothing) {
   session->start();
   session->stop();
   EXPECT_EQ(benchfile(), "TWReporting 4\n");
+}
+
+TEST_F(TWReportingSessionTraceWorkerTest, WaitingForTheTraceIsLongWorkOfTheTimeout) {
+  test.runtrace.onStart({Runtrace::didStart().after(10s)});
+  test.runtrace.onStop({Runtrace::didComplete(kTrace).after(100s)});
+  const auto heartbeat = std::make_shared<Heartbeat>();
+  const Heartbeat::OnThisThread scope(heartbeat);
+  std::chrono::milliseconds allowance{0};
+  const auto timer = test.timers.repeat(1s, [&] { allowance = heartbeat->read().allowance; });
+  session->start();
+  EXPECT_EQ(allowance, 15s);
+  session->stop();
+  EXPECT_EQ(allowance, 180s);
+  EXPECT_EQ(heartbeat->read().allowance, 0s);
 }
 
 }  // namespace

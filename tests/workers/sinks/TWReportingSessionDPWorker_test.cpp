@@ -8,6 +8,7 @@
 #include <string>
 #include <vector>
 
+#include "platform/Heartbeat.h"
 #include "session/TWReportingDefaults.h"
 #include "support/ReportingTest.h"
 #include "workers/sinks/TWReportingDPSettings.h"
@@ -419,6 +420,21 @@ TEST_F(TWReportingSessionDPWorkerTest, ASessionsOverloadReachesTheRequestWithWha
   session->sendMessage(message({{"smallest_buffer_frame_size", 1024}}, kIo, kError));
   ASSERT_EQ(requests(), 1U);
   EXPECT_TRUE(test.whirlcaps.requests()[0].payload.contains("twreporting_timestamp"));
+}
+
+// A thread that sleeps for longer than it said would look like one that hangs.
+TEST_F(TWReportingSessionDPWorkerTest, TheWaitIsLongWorkOfItsLength) {
+  switchOn();
+  configure("wait_time", 8e6);
+  const auto worker = makeWorker();
+  const auto heartbeat = std::make_shared<Heartbeat>();
+  const Heartbeat::OnThisThread scope(heartbeat);
+  std::chrono::milliseconds allowance{0};
+  const auto timer =
+      test.timers.repeat(std::chrono::seconds(3), [&] { allowance = heartbeat->read().allowance; });
+  worker->handleMessage(overload());
+  EXPECT_EQ(allowance, std::chrono::seconds(8));
+  EXPECT_EQ(heartbeat->read().allowance, std::chrono::seconds(0));
 }
 
 }  // namespace

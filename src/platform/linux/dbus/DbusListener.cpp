@@ -40,6 +40,8 @@ void DbusListener::shutDown() {
 
 void DbusListener::run() {
   nameThisThread("tw-dbus");
+  const Heartbeat::OnThisThread heartbeat(heartbeat_);
+  heartbeat_->beat();
   const DbusConnectionContext context{interface_, *delegate_, accounts_, waker_, texts_, log_, memory_};
   while (!isStopping_) {
     const auto start = std::chrono::steady_clock::now();
@@ -72,7 +74,10 @@ void DbusListener::pause() {
     const auto left = std::chrono::ceil<std::chrono::milliseconds>(end - std::chrono::steady_clock::now());
     if (left <= std::chrono::milliseconds::zero()) return;
     pollfd waited{waker_->fileDescriptor(), POLLIN, 0};
-    ::poll(&waited, 1, static_cast<int>(left.count()));
+    {
+      const Heartbeat::Rest rest;
+      ::poll(&waited, 1, static_cast<int>(left.count()));
+    }
     eventfd_t count = 0;
     static_cast<void>(::eventfd_read(waker_->fileDescriptor(), &count));
     static_cast<void>(waker_->take());  // dropped: the clients are gone

@@ -8,6 +8,7 @@
 #include <string>
 #include <thread>
 
+#include "platform/Heartbeat.h"
 #include "platform/Log.h"
 #include "platform/Messaging.h"
 #include "platform/linux/dbus/DbusInterface.h"
@@ -40,6 +41,9 @@ class DbusListener final : public MessagingListener {
   void resume() override;
   void shutDown() override;
 
+  // Any thread. The bus's thread beats with each event, and rests while it waits for one or for the bus.
+  std::shared_ptr<const Heartbeat> heartbeat() const { return heartbeat_; }
+
  private:
   void run();
   // Logs why the service has ended, but does not repeat the same reason with every try.
@@ -54,6 +58,7 @@ class DbusListener final : public MessagingListener {
   AllocatorReclaimer* const memory_;
   MessagingListenerDelegate* delegate_ = nullptr;
   const std::shared_ptr<IoWaker> waker_ = std::make_shared<IoWaker>();
+  const std::shared_ptr<Heartbeat> heartbeat_ = std::make_shared<Heartbeat>();
 
   // Used by the bus's thread only.
   RpcStrings texts_;

@@ -10,6 +10,7 @@
 #include <systemd/sd-bus.h>
 #include <utility>
 
+#include "platform/Heartbeat.h"
 #include "platform/Log.h"
 #include "platform/linux/dbus/DbusAnswer.h"
 
@@ -143,6 +144,7 @@ DbusService::End DbusService::serve(const std::atomic<bool>& isStopping) {
   if (bus_ == nullptr) return End::kNoBus;
   if (!start()) return End::kNoBus;
   while (!isStopping) {
+    Heartbeat::beatHere();
     takeWakes();
     sendAnswers();
     const bool mustSend = isFull();
@@ -192,6 +194,7 @@ bool DbusService::wait(bool onlyToSend) const {
   std::array<pollfd, 2> waited = {pollfd{context_.waker->fileDescriptor(), POLLIN, 0},
                                   pollfd{sd_bus_get_fd(bus_.get()), static_cast<short>(events), 0}};
   const auto timeout = timeToNextBusWork(bus_.get());
+  const Heartbeat::Rest rest;
   const int ready = ::poll(waited.data(), waited.size(), static_cast<int>(timeout.count()));
   return ready > 0 && waited[1].revents != 0;
 }

@@ -77,6 +77,8 @@ bool ReportStore::flush(std::chrono::milliseconds timeout) {
 
 void ReportStore::run() {
   pthread_setname_np(pthread_self(), "tw-store");
+  const Heartbeat::OnThisThread heartbeat(heartbeat_);
+  heartbeat_->beat();
   // The file is made, and its problems are logged, before the first row is recorded.
   queue_.beginAttempt();
   if (write()) {
@@ -84,9 +86,19 @@ void ReportStore::run() {
   } else {
     queue_.failed();
   }
-  while (queue_.take(batch_, !moreToTrim_)) {
+  while (takeBatch()) {
     if (!writeUntilDone()) return;
   }
+}
+
+bool ReportStore::takeBatch() {
+  const Heartbeat::Rest rest;
+  return queue_.take(batch_, !moreToTrim_);
+}
+
+bool ReportStore::pause(std::chrono::nanoseconds time) {
+  const Heartbeat::Rest rest;
+  return queue_.pause(time);
 }
 
 // Writes the batch, again after each failure. False when the store stops and the rows are not written.
@@ -96,7 +108,7 @@ bool ReportStore::writeUntilDone() {
     queue_.beginAttempt();
     if (write()) break;
     queue_.failed();
-    if (!queue_.pause(backOff.next())) {
+    if (!pause(backOff.next())) {
       if (!write()) return false;
       break;
     }

@@ -5,10 +5,12 @@
 #include <chrono>
 #include <cstdint>
 #include <map>
+#include <memory>
 #include <string>
 #include <string_view>
 #include <thread>
 
+#include "platform/Heartbeat.h"
 #include "platform/accounts/Account.h"
 #include "platform/linux/store/StoreBatch.h"
 #include "platform/linux/store/StoreDatabase.h"
@@ -72,6 +74,10 @@ class ReportStore {
   // `timeout`.
   [[nodiscard]] bool flush(std::chrono::milliseconds timeout);
 
+  // Any thread. The store's thread beats with each try to write, also one that fails, and while SQLite gets on
+  // with a long statement. It rests while there is nothing to write. So it stands still when the disk hangs.
+  std::shared_ptr<const Heartbeat> heartbeat() const { return heartbeat_; }
+
  private:
   // Limits how often the preferences are read: not for each batch.
   static constexpr std::chrono::seconds kBoundsInterval{10};
@@ -81,6 +87,8 @@ class ReportStore {
   template <typename Row>
   void add(const Row& row);
   void run();
+  [[nodiscard]] bool takeBatch();
+  [[nodiscard]] bool pause(std::chrono::nanoseconds time);
   [[nodiscard]] bool writeUntilDone();
   [[nodiscard]] bool write();
   [[nodiscard]] StoreDatabase::Result writeOrBeginAnew();
@@ -98,6 +106,7 @@ class ReportStore {
   const LogCategory& log_;
   StoreQueue queue_;
   std::atomic<bool> areBoundsStale_ = true;
+  const std::shared_ptr<Heartbeat> heartbeat_ = std::make_shared<Heartbeat>();
 
   // Used by the thread alone.
   StoreDatabase database_;

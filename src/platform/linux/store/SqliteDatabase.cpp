@@ -4,6 +4,7 @@
 #include <sqlite3.h>
 #include <utility>
 
+#include "platform/Heartbeat.h"
 #include "values/Utf8.h"
 
 namespace tonewerk {
@@ -113,6 +114,14 @@ void disableMemoryStatistics() {
   (void)result;  // it fails when another library has used SQLite before, and then only costs time
 }
 
+// A statement that changes the whole file takes minutes on a slow disk, but it takes steps all the time.
+constexpr int kStepsPerBeat = 100'000;
+
+int beat(void* /*unused*/) {
+  Heartbeat::beatHere();
+  return 0;  // the statement goes on
+}
+
 }  // namespace
 
 SqliteDatabase::~SqliteDatabase() { close(); }
@@ -128,7 +137,10 @@ bool SqliteDatabase::open(const std::string& path, Mode mode, std::chrono::milli
     name = "file:" + uriPath(path) + "?immutable=1";
   }
   isOpen_ = sqlite3_open_v2(name.c_str(), &database_, flags, nullptr) == SQLITE_OK;
-  if (isOpen_) sqlite3_busy_timeout(database_, static_cast<int>(patience.count()));
+  if (isOpen_) {
+    sqlite3_busy_timeout(database_, static_cast<int>(patience.count()));
+    sqlite3_progress_handler(database_, kStepsPerBeat, beat, nullptr);
+  }
   return isOpen_;
 }
 

@@ -40,6 +40,7 @@ void ThreadQueue::async(Task work) {
     const MutexLock lock(mutex_);
     pending_.push_back(std::move(work));
     mustWake = !isLent_ && std::exchange(isWaiting_, false);
+    if (mustWake) heartbeat_->beat();
   }
   if (mustWake) workArrived_.notifyOne();
 }
@@ -60,7 +61,10 @@ void ThreadQueue::takeBack() {
   // Notifies with the lock, because the queue may end as soon as its own thread goes on.
   const MutexLock lock(mutex_);
   isLent_ = false;
-  if ((isEnding_ || !pending_.empty()) && std::exchange(isWaiting_, false)) workArrived_.notifyOne();
+  if ((isEnding_ || !pending_.empty()) && std::exchange(isWaiting_, false)) {
+    heartbeat_->beat();
+    workArrived_.notifyOne();
+  }
 }
 
 void ThreadQueue::drain() {
@@ -75,6 +79,7 @@ void ThreadQueue::run() {
   nameThisThread(name_);
   setNicenessOfThisThread(priority_ == QueuePriority::kUserInteractive ? kUserInteractiveNiceness
                                                                        : kUtilityNiceness);
+  const Heartbeat::OnThisThread heartbeat(heartbeat_);
   std::vector<Task> batch;
   while (waitForWork(batch)) {
     const BatchScope scope;
@@ -84,6 +89,7 @@ void ThreadQueue::run() {
         work();
       }
       BatchScope::pieceHasRun();
+      heartbeat_->beat();
     }
     batch.clear();
     if (batch.capacity() > kMaxKeptCapacity) std::vector<Task>().swap(batch);
@@ -95,9 +101,11 @@ bool ThreadQueue::waitForWork(std::vector<Task>& batch) {
   while (pending_.empty() || isLent_) {
     if (isEnding_ && !isLent_) return false;
     isWaiting_ = true;
+    heartbeat_->rest();
     workArrived_.wait(lock);
   }
   isWaiting_ = false;
+  heartbeat_->beat();
   batch.swap(pending_);
   return true;
 }

@@ -2,9 +2,11 @@
 #pragma once
 
 #include <atomic>
+#include <memory>
 #include <thread>
 #include <vector>
 
+#include "platform/Heartbeat.h"
 #include "platform/SerialQueue.h"
 #include "values/Mutex.h"
 
@@ -14,6 +16,9 @@ namespace tonewerk {
 //
 // async() holds the lock only while it adds the work, and wakes the thread only when it is waiting. The
 // thread takes all pending work at once and runs it without the lock.
+//
+// The thread has a heartbeat, which beats after each piece of work. From the moment that work is queued, the
+// thread counts as working, even if it does not wake up. Work that another thread runs does not count.
 class ThreadQueue final : public SerialQueue {
  public:
   ThreadQueue(std::string name, QueuePriority priority);
@@ -45,6 +50,8 @@ class ThreadQueue final : public SerialQueue {
   bool isLent_ GUARDED_BY(mutex_) = false;  // another thread runs the queue's work, while the own one waits
   bool isEnding_ GUARDED_BY(mutex_) = false;
   Condition workArrived_;
+  // Written without the lock only while the thread runs work; otherwise async() or takeBack() may write it.
+  const std::shared_ptr<Heartbeat> heartbeat_ = std::make_shared<Heartbeat>();
   std::atomic<std::thread::id> borrower_;  // none while the queue is not lent
   std::thread thread_;                     // last, because it uses all members above
 };

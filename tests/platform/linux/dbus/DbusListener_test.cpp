@@ -5,6 +5,7 @@
 #include <chrono>
 #include <cstdint>
 #include <functional>
+#include <future>
 #include <gmock/gmock.h>
 #include <memory>
 #include <string>
@@ -629,6 +630,54 @@ TEST_F(StartingDbusListenerTest, LogsOnceThatTheBusDoesNotGiveItTheName) {
   ASSERT_TRUE(waitForLines(1));
   listener->shutDown();
   EXPECT_THAT(errorLines(), ElementsAre(HasSubstr("D-Bus refuses com.example.rig: ")));
+}
+
+// Turns clients away, after waiting for `mayGoOn`.
+class HangingDelegate final : public MessagingListenerDelegate {
+ public:
+  bool listenerShouldAcceptNewConnection(MessagingConnection& /*connection*/) override {
+    asked.set_value();
+    mayGoOn.get_future().wait();
+    return false;
+  }
+
+  std::promise<void> asked;
+  std::promise<void> mayGoOn;
+};
+
+TEST_F(DbusListenerTest, ItsHeartbeatRestsBetweenEventsAndStandsStillInAHandlerThatHangs) {
+  listener->shutDown();
+  ASSERT_TRUE(waitForName(false));
+  HangingDelegate hanging;
+  listener = std::make_unique<DbusListener>(kNames, rigInterface(), bus.address(), category);
+  listener->setDelegate(hanging);
+  listener->resume();
+  ASSERT_TRUE(waitForName());
+  const auto heartbeat = listener->heartbeat();
+  while (heartbeat->read().isWorking) std::this_thread::yield();
+
+  DbusCaller caller(bus.address(), kNames);
+  caller.send(caller.newCall("TakeInt64", "x", std::int64_t{1}));
+  ASSERT_GE(sd_bus_flush(caller.bus()), 0);
+  hanging.asked.get_future().wait();
+  const std::uint64_t before = heartbeat->read().beats;
+  EXPECT_TRUE(heartbeat->read().isWorking);
+  caller.send(caller.newCall("TakeInt64", "x", std::int64_t{2}));
+  ASSERT_GE(sd_bus_flush(caller.bus()), 0);
+  EXPECT_EQ(heartbeat->read().beats, before);
+
+  hanging.mayGoOn.set_value();
+  while (heartbeat->read().isWorking) std::this_thread::yield();
+  EXPECT_GT(heartbeat->read().beats, before);
+  listener->shutDown();
+}
+
+TEST_F(DbusListenerTest, ItsHeartbeatRestsWithoutABus) {
+  listener->shutDown();
+  startListener("unix:path=/nowhere/bus");
+  const auto heartbeat = listener->heartbeat();
+  while (heartbeat->read().beats < 2 || heartbeat->read().isWorking) std::this_thread::yield();
+  EXPECT_FALSE(heartbeat->read().isWorking);
 }
 
 }  // namespace

@@ -7,12 +7,15 @@
 #include <fstream>
 #include <gmock/gmock.h>
 #include <memory>
+#include <optional>
 #include <random>
 #include <string>
+#include <system_error>
 #include <thread>
 #include <tuple>
 #include <vector>
 
+#include "platform/Heartbeat.h"
 #include "platform/Log.h"
 #include "platform/accounts/Accounts.h"
 #include "platform/accounts/WorkingFor.h"
@@ -1069,6 +1072,81 @@ TEST_F(ReportStoreTest, IgnoresBoundsThatAreNoNumberFromOne) {
   ASSERT_TRUE(flush());
   EXPECT_THAT(events(), SizeIs(2));
   EXPECT_THAT(errors(), ElementsAre(AllOf(HasSubstr("max_megabytes = much"), HasSubstr("max_days = 0"))));
+}
+
+// Preferences whose reading hangs, as on a disk that does not answer, until `goOn` is set.
+class HangingPreferences final : public PreferenceStore {
+ public:
+  std::optional<Value> read(std::string_view /*domain*/, std::string_view /*key*/) const override {
+    while (!goOn) std::this_thread::yield();
+    return std::nullopt;
+  }
+  ValueMap readAll(std::string_view /*domain*/) const override { return {}; }
+  std::error_code write(std::string_view /*domain*/, std::string_view /*key*/, const Value& /*value*/,
+                        std::string* /*problem*/) override {
+    return std::make_error_code(std::errc::io_error);
+  }
+  std::error_code remove(std::string_view /*domain*/, std::string_view /*key*/,
+                         std::string* /*problem*/) override {
+    return std::make_error_code(std::errc::io_error);
+  }
+
+  std::atomic<bool> goOn = false;
+};
+
+void waitForRest(const ReportStore& store) {
+  while (store.heartbeat()->read().isWorking) std::this_thread::yield();
+}
+
+TEST_F(ReportStoreTest, ItsHeartbeatRestsWithoutRowsAndBeatsWithEachBatch) {
+  open();
+  EXPECT_TRUE(flush());
+  waitForRest(*store_);
+  const std::uint64_t before = store_->heartbeat()->read().beats;
+  recordNumbered(1);
+  EXPECT_TRUE(flush());
+  waitForRest(*store_);
+  EXPECT_GT(store_->heartbeat()->read().beats, before);
+}
+
+TEST_F(ReportStoreTest, ItsHeartbeatStandsStillWhileWhatItCallsHangs) {
+  HangingPreferences hanging;
+  ReportStore store(directory_, json_, hanging, clock_, category_);
+  while (!store.heartbeat()->read().isWorking) std::this_thread::yield();
+  const std::uint64_t before = store.heartbeat()->read().beats;
+  store.record(PowerRow{clock_.now(), 28, "power", {{"n", 1}}});
+  EXPECT_FALSE(store.flush(std::chrono::milliseconds(0)));
+  EXPECT_TRUE(store.heartbeat()->read().isWorking);
+  EXPECT_EQ(store.heartbeat()->read().beats, before);
+  hanging.goOn = true;
+  EXPECT_TRUE(store.flush(kLongEnough));
+  EXPECT_GT(store.heartbeat()->read().beats, before);
+}
+
+// A daemon whose disk is full must live on.
+TEST_F(BrokenReportStoreTest, ItsHeartbeatBeatsWithEachTryThatFailsAndRestsInBetween) {
+  open();
+  std::uint64_t before = store_->heartbeat()->read().beats;
+  for (int round = 0; round < 3; ++round) {
+    recordNumbered(1);
+    EXPECT_FALSE(flush());
+    waitForRest(*store_);
+    const std::uint64_t after = store_->heartbeat()->read().beats;
+    EXPECT_GT(after, before);
+    before = after;
+  }
+}
+
+TEST_F(ReportStoreTest, ALongStatementBeatsAsItGoesOn) {
+  const auto heartbeat = std::make_shared<Heartbeat>();
+  const Heartbeat::OnThisThread scope(heartbeat);
+  SqliteDatabase database;
+  ASSERT_TRUE(database.open(temporary_.path("long.db"), SqliteDatabase::Mode::kReadWrite, kLongEnough));
+  const std::uint64_t before = heartbeat->read().beats;
+  EXPECT_TRUE(
+      database.run("WITH RECURSIVE n(x) AS (SELECT 1 UNION ALL SELECT x + 1 FROM n LIMIT 100000) "
+                   "SELECT sum(x) FROM n"));
+  EXPECT_GE(heartbeat->read().beats, before + 3);
 }
 
 }  // namespace

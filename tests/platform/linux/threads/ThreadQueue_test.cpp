@@ -2,12 +2,15 @@
 #include "platform/linux/threads/ThreadQueue.h"
 
 #include <array>
+#include <cstdint>
 #include <future>
 #include <gtest/gtest.h>
 #include <memory>
 #include <pthread.h>
 #include <string>
 #include <thread>
+
+#include "platform/Heartbeat.h"
 
 namespace tonewerk {
 namespace {
@@ -134,6 +137,67 @@ TEST(ThreadQueueTest, NeverRunsTwoPiecesAtATimeWhoeverRunsThem) {
   other.join();
   queue.drain();
   EXPECT_EQ(ran, 2 * kPieces);
+}
+
+class ThreadQueueHeartbeatTest : public testing::Test {
+ protected:
+  // Waits until the queue's thread rests.
+  void waitForRest() {
+    while (heartbeat->read().isWorking) std::this_thread::yield();
+  }
+
+  ThreadQueue queue{"work", QueuePriority::kUtility};
+  std::shared_ptr<const Heartbeat> heartbeat = [this] {
+    std::shared_ptr<const Heartbeat> found;
+    queue.async([&] { found = Heartbeat::ofThisThread(); });
+    queue.drain();
+    return found;
+  }();
+};
+
+TEST_F(ThreadQueueHeartbeatTest, BeatsAfterEachPieceOfWork) {
+  ASSERT_NE(heartbeat, nullptr);
+  std::array<std::uint64_t, 3> beats{};
+  queue.async([&] {
+    for (std::uint64_t& count : beats) queue.async([&] { count = heartbeat->read().beats; });
+  });
+  queue.drain();
+  EXPECT_LT(beats[0], beats[1]);
+  EXPECT_LT(beats[1], beats[2]);
+}
+
+TEST_F(ThreadQueueHeartbeatTest, StandsStillInAPieceThatHangsAndRestsAfterTheLast) {
+  std::promise<void> begun;
+  std::promise<void> end;
+  queue.async([&] {
+    begun.set_value();
+    end.get_future().wait();
+  });
+  begun.get_future().wait();
+  const Heartbeat::Reading before = heartbeat->read();
+  EXPECT_TRUE(before.isWorking);
+  queue.async([] {});  // more work is no progress
+  EXPECT_EQ(heartbeat->read().beats, before.beats);
+  end.set_value();
+  queue.drain();
+  waitForRest();
+  EXPECT_GT(heartbeat->read().beats, before.beats);
+}
+
+// A thread that never wakes up would otherwise look like one that has nothing to do.
+TEST_F(ThreadQueueHeartbeatTest, WorksFromTheMomentThatWorkIsQueued) {
+  for (int round = 0; round < 1'000; ++round) {
+    waitForRest();
+    const std::uint64_t before = heartbeat->read().beats;
+    queue.async([] {});
+    EXPECT_TRUE(heartbeat->read().isWorking || heartbeat->read().beats > before);
+    queue.drain();
+  }
+}
+
+TEST_F(ThreadQueueHeartbeatTest, RestsWhileAnotherThreadRunsTheWork) {
+  runAtOnceWhenItWaits(queue, [&] { EXPECT_FALSE(heartbeat->read().isWorking); });
+  waitForRest();
 }
 
 }  // namespace
