@@ -16,6 +16,7 @@
 #include <unistd.h>
 
 #include "monitor/TWReportingSystemMonitor.h"
+#include "platform/Heartbeat.h"
 #include "platform/Log.h"
 #include "platform/Platform.h"
 #include "platform/accounts/TurnQueue.h"
@@ -35,6 +36,7 @@
 #include "platform/linux/store/StoreDiagwire.h"
 #include "platform/linux/store/StoreEnergybook.h"
 #include "platform/linux/store/StoreMetricon.h"
+#include "platform/linux/system/Heartbeats.h"
 #include "platform/linux/system/ServiceManager.h"
 #include "platform/linux/system/WatchdogFeeder.h"
 #include "platform/linux/tracing/Tracing.h"
@@ -74,12 +76,13 @@ constexpr std::string_view kHelp =
     "things\n"
     "are, TONEWERK_LOG what is logged (debug, info, default, error, or a list such as twrr=debug,default).\n";
 
-// The thread that serves clients feeds the service manager's watchdog, if there is one. The work queue does
-// not, because some handlers block it for minutes by design, which is no reason to end the daemon.
-std::unique_ptr<WatchdogFeeder> watchdogOf(const ServiceManager& manager, const Clock& clock) {
+// The messaging thread feeds the service manager's watchdog, if there is one, while the heartbeats are alive.
+std::unique_ptr<WatchdogFeeder> watchdogOf(const ServiceManager& manager, const Clock& clock,
+                                           Heartbeats& heartbeats) {
   const auto interval = manager.pingInterval();
   if (!interval) return nullptr;
-  return std::make_unique<WatchdogFeeder>(*interval, clock, [&manager] { manager.ping(); });
+  const auto ping = [&manager] { manager.ping(); };
+  return std::make_unique<WatchdogFeeder>(*interval, clock, ping, &heartbeats);
 }
 
 DbusNames dbusNames() {
@@ -97,6 +100,7 @@ class Daemon {
         linux_(linux),
         runtimeDirectory_(directories.runtime),
         log_(log),
+        heartbeats_(log),
         store_(directories.state, linux.json(), linux.preferences(), linux.clock(), linux.accounts(), log),
         metricon_(store_, linux.preferences(), linux.clock(), log),
         energybook_(store_, linux.clock()),
@@ -109,13 +113,14 @@ class Daemon {
         diagnostics_(linux.diagnostics()),
         context_(platformOf(linux, directories), allWorkerClasses()),
         service_(TWReportingService::make([this] { endOnKillRequest(); })),
-        listener_(std::move(socket), log, linux.accounts(), watchdogOf(manager, linux.clock()),
+        listener_(std::move(socket), log, linux.accounts(), watchdogOf(manager, linux.clock(), heartbeats_),
                   &linux.memory()),
         dbusListener_(dbusNames(), requests::all(), dbusAddressFromEnvironment(), log, linux.accounts(),
                       &linux.memory()) {
     diagnostics_.removeLeftovers();  // this daemon has the socket, so no other one writes there
     // Read once here, so that reading the device facts again later does not change it.
     hasSignposts_ = context_.isInternalBuild() && isTracingBuiltIn();
+    watchHeartbeats();
     listener_.setDelegate(*service_);
     listener_.resume();
     dbusListener_.setDelegate(*service_);
@@ -164,6 +169,14 @@ class Daemon {
   }
 
  private:
+  // The messaging thread needs none: it feeds the watchdog itself.
+  void watchHeartbeats() {
+    heartbeats_.watch("the store", store_.heartbeat());
+    heartbeats_.watch("D-Bus", dbusListener_.heartbeat());
+    context_.reportingServerQueue().async(
+        [this] { heartbeats_.watch("the work queue", Heartbeat::ofThisThread()); });
+  }
+
   void markSignposts() {
     if (const std::error_code error = setSignpostMark(runtimeDirectory_, hasSignposts_)) {
       errorLog(log_, "cannot tell programs about signposts: %@", error.message());
@@ -208,6 +221,7 @@ class Daemon {
   const std::string runtimeDirectory_;
   const LogCategory& log_;
   bool hasSignposts_ = false;
+  Heartbeats heartbeats_;
   ReportStore store_;
   StoreMetricon metricon_;
   StoreEnergybook energybook_;

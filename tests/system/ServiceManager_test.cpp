@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // Tests the daemon with the service manager that started it.
+#include <csignal>
 #include <fcntl.h>
 #include <string>
 #include <sys/stat.h>
@@ -8,6 +9,7 @@
 #include "platform/linux/descriptors/FileDescriptor.h"
 #include "support/NotifySocket.h"
 #include "system/support/DaemonTest.h"
+#include "system/support/StoppedThread.h"
 
 namespace tonewerk {
 namespace {
@@ -72,6 +74,38 @@ TEST_F(ServiceManagerSystemTest, IsPingedWhileTheWorkQueueIsBlocked) {
     EXPECT_EQ(logLinesWith("request cat", "captured"), 0U);
   }
   EXPECT_TRUE(waitForLogLine("request cat " + gate + " captured"));
+}
+
+TEST_F(ServiceManagerSystemTest, IsToldNothingWhileTheWorkQueueHangsAndTheLogNamesIt) {
+  daemon.setEnvironment("WATCHDOG_USEC", "400000");
+  ASSERT_TRUE(daemon.start());
+  EXPECT_EQ(manager.waitForLine("WATCHDOG=1"), "WATCHDOG=1");
+  {
+    const StoppedThread workQueue(daemon.process().identifier(), "eporting.server");
+    daemon.process().signal(SIGUSR1);  // the status is work for it
+    ASSERT_TRUE(waitForLogLine("the work queue has made no progress for 0 s"));
+    manager.take();
+    EXPECT_TRUE(daemon.accepts());  // the messaging thread goes on
+    EXPECT_THAT(manager.take(), IsEmpty());
+    EXPECT_EQ(logLinesWith("status: clients"), 0U);
+  }
+  EXPECT_EQ(manager.waitForLine("WATCHDOG=1"), "WATCHDOG=1");
+  EXPECT_TRUE(waitForLogLine("the work queue makes progress again"));
+  EXPECT_TRUE(waitForLogLine("status: clients"));
+}
+
+TEST_F(ServiceManagerSystemTest, IsToldNothingWhileTheMessagingThreadHangs) {
+  daemon.setEnvironment("WATCHDOG_USEC", "200000");
+  ASSERT_TRUE(daemon.start());
+  EXPECT_EQ(manager.waitForLine("WATCHDOG=1"), "WATCHDOG=1");
+  {
+    const StoppedThread messaging(daemon.process().identifier(), "tw-messaging");
+    manager.take();
+    daemon.process().signal(SIGUSR1);
+    EXPECT_TRUE(waitForLogLine("status: clients"));  // the others go on
+    EXPECT_THAT(manager.take(), IsEmpty());
+  }
+  EXPECT_EQ(manager.waitForLine("WATCHDOG=1"), "WATCHDOG=1");
 }
 
 }  // namespace

@@ -1,0 +1,23 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <string>
+#include <sys/types.h>
+
+namespace tonewerk {
+
+// Stops one thread of a child process, as a thread would stand still that hangs. The other threads go on. The
+// thread goes on when the object is destroyed, on the test's thread that made it.
+class StoppedThread {
+ public:
+  // `name` is the thread's, as the kernel has it. Adds a test failure when there is no such thread.
+  StoppedThread(pid_t process, const std::string& name);
+  StoppedThread(const StoppedThread&) = delete;
+  StoppedThread& operator=(const StoppedThread&) = delete;
+  ~StoppedThread();
+
+ private:
+  pid_t thread_ = -1;
+};
+
+}  // namespace tonewerk
