@@ -125,10 +125,21 @@ std::error_code NotificationFiles::post(std::string_view name) const {
   // Closing a file that was opened for writing is a post. It keeps a state that another writer sets
   // meanwhile.
   if (openRegularFile(path, O_WRONLY, error)) return {};
+  if (error == std::errc::permission_denied) return takeOver(name);
   if (error != std::errc::no_such_file_or_directory) return error;
   error = put(0, [&](const char* made) { return link(made, path.c_str()); });
   // Another process created the file meanwhile. That was a post of the same name.
   return error == std::errc::file_exists ? std::error_code() : error;
+}
+
+// A state that another writer sets meanwhile is lost, as if it had been set before.
+std::error_code NotificationFiles::takeOver(std::string_view name) const {
+  std::error_code error;
+  const std::optional<std::uint64_t> kept = state(name, error);
+  if (error == std::errc::permission_denied) return error;
+  error = post(name, kept.value_or(0));
+  return error == std::errc::operation_not_permitted ? std::make_error_code(std::errc::permission_denied)
+                                                     : error;
 }
 
 std::error_code NotificationFiles::post(std::string_view name, std::uint64_t state) const {

@@ -33,12 +33,18 @@ class NotificationFiles {
   // Posts the name and keeps its state; the contents of its file do not matter. A name without a file gets
   // the state 0. Both post() functions create a missing directory. When the process is root, everything they
   // create gets the owner of the directory that contains it.
+  //
+  // A directory with the sticky bit keeps a name for the user who posted it first: both functions then fail
+  // for others, with std::errc::permission_denied or operation_not_permitted. But for the directory's owner
+  // they replace the file by one of its own.
   [[nodiscard]] std::error_code post(std::string_view name) const;
   // Posts the name with a new state. Readers see either the old file or the new one.
   [[nodiscard]] std::error_code post(std::string_view name, std::uint64_t state) const;
 
  private:
   std::string pathOf(std::string_view name) const;
+  // Posts a name whose file belongs to another user.
+  [[nodiscard]] std::error_code takeOver(std::string_view name) const;
   // Writes a file with a temporary name and then calls `place` to give it its final name.
   template <typename Place>
   [[nodiscard]] std::error_code put(std::uint64_t state, Place place) const;

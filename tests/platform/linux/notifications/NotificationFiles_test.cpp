@@ -152,5 +152,59 @@ TEST_F(NotificationFilesTest, TheDirectorysOwnerCanPostANameAfterRoot) {
   EXPECT_EQ(state("unstated"), 7);
 }
 
+// The directory has the sticky bit, belongs to `owner`, and everybody may write to it.
+class SharedNotificationFilesTest : public NotificationFilesTest {
+ protected:
+  void SetUp() override {
+    if (geteuid() != 0) GTEST_SKIP() << "only root can be another user";
+  }
+  void share(uid_t owner) {
+    std::filesystem::create_directories(files.directory());
+    for (const std::string& path : {directory.path(), directory.path("a"), files.directory()}) {
+      ASSERT_EQ(chown(path.c_str(), owner, owner), 0);
+    }
+    ASSERT_EQ(chmod(files.directory().c_str(), 01777), 0);
+    ASSERT_EQ(chmod(directory.path().c_str(), 0755), 0);
+  }
+  uid_t ownerOf(const std::string& name) const {
+    struct stat status {};
+    EXPECT_EQ(stat((files.directory() + "/" + name).c_str(), &status), 0);
+    return status.st_uid;
+  }
+  void writeAs(uid_t owner, const std::string& name, const std::string& text) {
+    write(name, text);
+    ASSERT_EQ(chown((files.directory() + "/" + name).c_str(), owner, owner), 0);
+    ASSERT_EQ(chmod((files.directory() + "/" + name).c_str(), 0644), 0);
+  }
+
+  static constexpr uid_t kThirdUser = kOtherUser - 1;
+};
+
+TEST_F(SharedNotificationFilesTest, TheDirectorysOwnerPostsTheNameOfAnotherUserAndKeepsItsState) {
+  share(kOtherUser);
+  writeAs(kThirdUser, "a", "5\n");
+  runAsOtherUser([this] { EXPECT_FALSE(files.post("a")); });
+  EXPECT_EQ(ownerOf("a"), kOtherUser);
+  EXPECT_EQ(state("a"), 5U);
+  EXPECT_THAT(names(), UnorderedElementsAre("a"));
+  runAsOtherUser([this] { EXPECT_FALSE(files.post("a", 6)); });
+  EXPECT_EQ(state("a"), 6U);
+}
+
+TEST_F(SharedNotificationFilesTest, NobodyElsePostsTheNameOfAnotherUser) {
+  share(kThirdUser);
+  writeAs(kThirdUser, "a", "5\n");
+  runAsOtherUser([this] {
+    EXPECT_EQ(files.post("a"), std::errc::permission_denied);
+    EXPECT_EQ(files.post("a", 6), std::errc::operation_not_permitted);
+    EXPECT_FALSE(files.post("b", 1));
+    EXPECT_FALSE(files.post("b", 2));
+  });
+  EXPECT_EQ(ownerOf("a"), kThirdUser);
+  EXPECT_EQ(state("a"), 5U);
+  EXPECT_EQ(state("b"), 2U);
+  EXPECT_THAT(names(), UnorderedElementsAre("a", "b"));
+}
+
 }  // namespace
 }  // namespace tonewerk
