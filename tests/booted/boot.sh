@@ -10,4 +10,4 @@ check 'the socket belongs to the daemon and the group audio' \
   equal "$(stat --format '%U:%G %a' /run/tonewerk/reporting.sock)" 'tonewerk:audio 660'
 check 'its directories belong to them, too' \
   equal "$(stat --format '%n %U:%G %a' /run/tonewerk /run/tonewerk/channels /run/tonewerk/notifications | paste -sd,)" \
-  '/run/tonewerk tonewerk:tonewerk 755,/run/tonewerk/channels tonewerk:audio 2775,/run/tonewerk/notifications tonewerk:audio 2775'
+  '/run/tonewerk tonewerk:tonewerk 755,/run/tonewerk/channels tonewerk:audio 3770,/run/tonewerk/notifications tonewerk:audio 3770'

@@ -6,6 +6,7 @@ has() { [ "$(how_many "$1")" -ge "$2" ]; }
 check 'leaking haptics and a silent alarm were captured' await has captures 2
 check 'a draft was made' await has drafts 1
 check 'an overload left a stall trace' await has whirlcaps 1
+check 'of which the daemon has told' equal "$(stat --format %U /run/tonewerk/notifications/com.orvane.tonewerk.dropped-whirlcap)" tonewerk
 check 'nothing of it was forbidden' eval '! grep -rE "ermission|EACCES|not permitted" /var/lib/tonewerk/{captures,issue-drafts,whirlcaps}/*/request.json'
 folders_are_complete() {
   local folder file

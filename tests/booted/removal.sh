@@ -20,6 +20,7 @@ left_of() { dpkg-query --show --showformat '${Package} ${db:Status-Status}\n' "$
 check 'the packages are removed' eval 'dpkg --remove $packages >/tmp/removal 2>&1 || { cat /tmp/removal; false; }'
 check 'the removal complains of nothing' eval '! complaint /tmp/removal'
 check 'no daemon is left' eval '! pgrep -a twreportingd'
+check 'nor a mount' eval '! grep tonewerk /proc/mounts'
 check 'no socket either' eval '! find /run -name reporting.sock | grep .'
 check 'the profile is gone from the kernel' eval '! grep twreportingd /sys/kernel/security/apparmor/profiles'
 check 'reports and configuration are kept' test -s $store -a -s /etc/tonewerk/device-facts.toml
@@ -35,5 +36,6 @@ check 'what the user has kept is the user'\''s' test -s /home/player/.local/stat
 check 'the packages install on a running system' eval 'dpkg --install /tests/{lib,tonewerk}*.deb >/tmp/install 2>&1 || { cat /tmp/install; false; }'
 check 'the installation complains of nothing' eval '! grep -vE "^(Selecting|Preparing|Unpacking|Setting up|Processing|Created symlink|\(Reading|Creating|/usr/lib/tmpfiles)" /tmp/install'
 check 'the first client is served at once' as player twctl --system list
+check 'whose directories are mounted' eval 'mountpoint -q /run/tonewerk/channels && mountpoint -q /run/tonewerk/notifications'
 check "as is a user's own" as player twctl list
 check 'whose socket waits for the user without a bus, too' as outsider systemctl --user --quiet is-active twreportingd.socket
