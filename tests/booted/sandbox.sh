@@ -13,6 +13,7 @@ check 'it cannot write to the system' says 'Read-only file system' in_its_place 
 check 'nor, as its user, to its configuration' says 'Permission denied' in_its_place runuser -u tonewerk -- touch /etc/tonewerk/tonewerk-was-here
 check 'it can write its state' in_its_place test -w /var/lib/tonewerk -a -w /var/log/tonewerk -a -w /run/tonewerk
 check 'it sees no homes' equal "$(in_its_place ls -A /home /root /run/user | paste -sd' ')" '/home:  /root:  /run/user:'
+check 'its memory and its threads are bounded' equal "$(state MemoryMax) $(state TasksMax)" '1073741824 256'
 check 'it sees no devices but the harmless ones' equal "$(in_its_place sh -c 'find /dev -type b; ls -d /dev/null')" /dev/null
 check "its temporary files are not others'" equal "$(touch /tmp/of-somebody && in_its_place sh -c 'ls -d /tmp /tmp/*' 2>/dev/null)" /tmp
 check "it cannot change the kernel's variables" says 'Read-only file system' in_its_place sh -c 'echo 1 >/proc/sys/kernel/panic'

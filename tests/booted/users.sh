@@ -14,6 +14,15 @@ check 'no daemon runs without a client' equal "$(user_daemon)" 0
 check 'the first client is served' as player twctl list
 check "by a daemon of the user's" equal "$(ps -o user:16= -p "$(user_daemon)" | tr -d ' ')" player
 check 'which is held to its profile, too' equal "$(cat "/proc/$(user_daemon)/attr/current")" 'twreportingd (enforce)'
+user_status() { awk -v key="$1:" '$1 == key { print $2 }' "/proc/$(user_daemon)/status"; }
+check 'can gain no rights, and its system calls are filtered' equal "$(user_status NoNewPrivs) $(user_status Seccomp)" '1 2'
+check 'and its memory and its threads are bounded' \
+  equal "$(user_unit show --value --property MemoryMax --property TasksMax $unit | grep . | sort | paste -sd' ')" '1073741824 256'
+check 'systemd finds it restricted, without privileges' \
+  says 'Overall exposure level for twreportingd.service: [0-6]\.' as player systemd-analyze --user --no-pager security $unit
+# Why the unit has no more restrictions: they need a user namespace, in which the daemon's client root would be nobody.
+check 'in a user namespace of a service of a user root would be nobody' \
+  says '^nobody$' as player systemd-run --user --quiet --wait --pipe --property PrivateUsers=yes stat --format %U /etc/passwd
 check "and which is not the system's" eval '[ "$(user_daemon)" != "$(daemon)" ]'
 check "the user's bus has the daemon's name" await says '^b true' as player busctl --user call com.orvane.tonewerk.reporting \
   /com/orvane/tonewerk/reporting com.orvane.tonewerk.TWReportingServiceProtocol CreateReportingSession x 5
