@@ -13,8 +13,8 @@ namespace tonewerk {
 //   beat()            rest()                    beat()
 //     works, and gets on  |  has nothing to do    |  works again
 //
-// A reader compares two readings: a thread that works and has not beaten in between has not moved. No clock is
-// read, so a beat costs about a nanosecond.
+// A reader compares two readings: a thread that works and has not beaten in between has not moved. No clock
+// is read, so a beat costs about a nanosecond.
 class Heartbeat {
  public:
   struct Reading {
@@ -73,8 +73,8 @@ class Heartbeat::OnThisThread {
   const std::shared_ptr<Heartbeat> heartbeat_;
 };
 
-// The calling thread has nothing to do, or waits for something else than its work, as long as this lives. Does
-// nothing on a thread without a heartbeat.
+// The calling thread has nothing to do, or waits for something else than its work, as long as this lives.
+// Does nothing on a thread without a heartbeat.
 class Heartbeat::Rest {
  public:
   Rest();

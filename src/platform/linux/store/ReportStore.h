@@ -74,8 +74,9 @@ class ReportStore {
   // `timeout`.
   [[nodiscard]] bool flush(std::chrono::milliseconds timeout);
 
-  // Any thread. The store's thread beats with each try to write, also one that fails, and while SQLite gets on
-  // with a long statement. It rests while there is nothing to write. So it stands still when the disk hangs.
+  // Any thread. The store's thread beats with each try to write, also one that fails, and while SQLite gets
+  // on with a long statement. It rests while there is nothing to write. So it stands still when the disk
+  // hangs.
   std::shared_ptr<const Heartbeat> heartbeat() const { return heartbeat_; }
 
  private:
