@@ -213,10 +213,16 @@ struct TWReportingClientServerInstance::Delivery {
   // Sends to the next sessions until the user's turn is over.
   TurnQueue::Progress run(const TurnQueue& turns) {
     while (next < sessions.size()) {
+      if (turns.mustGiveUp()) {
+        errorLog(category(),
+                 "a message does not reach the last %zu of its %zu sessions, because the daemon ends",
+                 sessions.size() - next, sessions.size());
+        break;
+      }
       const Session session = std::move(sessions[next++]);
       // The last session gets the only reference and can change the message without a copy.
       send(session, next == sessions.size() ? std::move(message) : message);
-      if (next == sessions.size() || !turns.isTurnOver()) continue;
+      if (next == sessions.size() || !turns.isTurnOverAfterLongStep()) continue;
       charge.reduceTo(bytes * (sessions.size() - next));
       return TurnQueue::Progress::kMore;
     }
@@ -385,7 +391,7 @@ void TWReportingClientServerInstance::handleConnectionError() {
     for (auto at = last ? sessions.upper_bound(*last) : sessions.begin(); at != sessions.end(); ++at) {
       last = at->first;
       if (at->second->started()) at->second->stop();
-      if (turns.isTurnOver()) return Progress::kMore;
+      if (turns.isTurnOverAfterLongStep()) return Progress::kMore;
     }
     while (!sessions.empty()) self->removeSession(sessions.begin()->first);
     delegate->removeClient(*self);

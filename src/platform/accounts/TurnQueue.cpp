@@ -78,6 +78,7 @@ TurnQueue::Lane* TurnQueue::takeNext(std::vector<Lane*>& waiting) {
 
 void TurnQueue::runPieces(Lane& lane) {
   turnBegan_ = clock_.monotonic();
+  if (isEnding_ && turnBegan_ - endBegan_ > kLongestFinish) mustGiveUp_ = true;
   running_ = lane.account.get();
   runningLane_ = &lane;
   const WorkingFor scope(lane.account);
@@ -155,6 +156,7 @@ bool TurnQueue::hasPieces() const {
 }
 
 void TurnQueue::finish() {
+  endBegan_ = clock_.monotonic();
   isEnding_ = true;
   std::vector<Lane*> waiting;
   {

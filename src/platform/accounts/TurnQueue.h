@@ -45,6 +45,7 @@ class TurnQueue : public std::enable_shared_from_this<TurnQueue> {
   static constexpr std::chrono::milliseconds kLargestDebt{50};
   // A sink that has written nothing for so long does not hold a user's work any more.
   static constexpr std::chrono::milliseconds kLongestWait{2000};
+  static constexpr std::chrono::milliseconds kLongestFinish{5000};
 
   // A piece of work is called again, in the user's next turn, as long as it returns kMore.
   enum class Progress { kDone, kMore };
@@ -86,9 +87,16 @@ class TurnQueue : public std::enable_shared_from_this<TurnQueue> {
            (othersWait_.load(std::memory_order_relaxed) && isTimeOver());
   }
 
-  // From now on no user waits for room. Returns when everything that was added has run. Not in the queue's
-  // own work.
+  // The same for a piece of long steps, such as the stops of many sessions: also true after a turn's time when
+  // nobody waits, so that the serial queue's other work comes in between.
+  bool isTurnOverAfterLongStep() const { return running_ != nullptr && (isTurnOver() || isTimeOver()); }
+
+  // From now on no user waits for room. Returns when everything that was added has run. After kLongestFinish,
+  // long pieces are asked to give up (mustGiveUp()). Not in the queue's own work.
   void finish();
+  // True when the end has waited so long that a piece of very many steps, such as a message to thousands of
+  // sessions, should leave out the rest.
+  bool mustGiveUp() const { return mustGiveUp_.load(std::memory_order_relaxed); }
   // Drops what is left, and everything that is added later. Call it before the serial queue ends.
   void close();
 
@@ -128,6 +136,8 @@ class TurnQueue : public std::enable_shared_from_this<TurnQueue> {
   std::atomic<bool> othersWait_ = false;      // a lane is ready, beside the running one
   std::atomic<bool> mayHaveWaiting_ = false;  // a lane waits for room
   std::atomic<bool> isEnding_ = false;
+  std::chrono::nanoseconds endBegan_{0};  // written before isEnding_ is set
+  std::atomic<bool> mustGiveUp_ = false;
 
   mutable Mutex mutex_;  // held while a turn is queued, never while one runs
   std::map<const Account*, Lane> lanes_ GUARDED_BY(mutex_);

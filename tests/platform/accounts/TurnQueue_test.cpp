@@ -94,6 +94,7 @@ TEST_F(TurnQueueTest, ALongPieceOfTheOnlyUserIsNotInterrupted) {
   turns->add(anna, [this] {
     clock.advance(1s);
     EXPECT_FALSE(turns->isTurnOver());
+    EXPECT_TRUE(turns->isTurnOverAfterLongStep());
     return Progress::kDone;
   });
   queues.runAll();
@@ -190,6 +191,18 @@ TEST_F(TurnQueueTest, TheEndRunsWhatWaitsForRoom) {
   turns->finish();
   EXPECT_EQ(ran, (Names{"a1", "a2"}));
   anna->give(Resource::kSinkBytes, 16 * kMiB);
+}
+
+TEST_F(TurnQueueTest, AtTheEndVeryLongPiecesAreAskedToGiveUp) {
+  int slices = 0;
+  turns->add(anna, [&, this] {
+    clock.advance(1s);
+    ++slices;
+    return turns->mustGiveUp() ? Progress::kDone : Progress::kMore;
+  });
+  EXPECT_FALSE(turns->mustGiveUp());
+  turns->finish();
+  EXPECT_TRUE(turns->mustGiveUp());
 }
 
 TEST_F(TurnQueueTest, NothingRunsAfterClose) {

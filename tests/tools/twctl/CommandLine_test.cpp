@@ -414,7 +414,8 @@ TEST_F(EventsCommandTest, PrintsNothingThatControlsATerminal) {
     const LogCategory category(log, "com.orvane.tonewerk", "twrs");
     const MemoryPreferenceStore preferences;
     ManualClock clock;
-    ReportStore store(directory_.path("state"), json_, preferences, clock, category);
+    Accounts accounts(990, clock);
+    ReportStore store(directory_.path("state"), json_, preferences, clock, accounts, category);
     store.recordEvent(1'763'633'880.0, "com.orvane.a\x1b\n", {{"k\x7F", "v\xC2\x9B\xE2\x80\xAE"}});
   }
   EXPECT_EQ(run({"events"}), kDone);
@@ -538,7 +539,8 @@ TEST_F(PowerCommandTest, PrintsNothingThatControlsATerminal) {
     const LogCategory category(log, "com.orvane.tonewerk", "twrs");
     const MemoryPreferenceStore preferences;
     ManualClock clock;
-    ReportStore store(directory_.path("state"), json_, preferences, clock, category);
+    Accounts accounts(990, clock);
+    ReportStore store(directory_.path("state"), json_, preferences, clock, accounts, category);
     store.record(PowerRow{1'763'633'880.0,
                           28,
                           "Flumen_Haptics_EngineOnDuration",

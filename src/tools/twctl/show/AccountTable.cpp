@@ -11,7 +11,7 @@
 
 #include "protocol/RequestSet.h"
 #include "protocol/WatchKeys.h"
-#include "tools/twctl/show/PrintableText.h"
+#include "values/PrintableText.h"
 
 namespace tonewerk {
 namespace {

@@ -649,7 +649,7 @@ TEST_F(DbusListenerTest, ItsHeartbeatRestsBetweenEventsAndStandsStillInAHandlerT
   listener->shutDown();
   ASSERT_TRUE(waitForName(false));
   HangingDelegate hanging;
-  listener = std::make_unique<DbusListener>(kNames, rigInterface(), bus.address(), category);
+  listener = std::make_unique<DbusListener>(kNames, rigInterface(), bus.address(), category, accounts);
   listener->setDelegate(hanging);
   listener->resume();
   ASSERT_TRUE(waitForName());

@@ -1111,7 +1111,7 @@ TEST_F(ReportStoreTest, ItsHeartbeatRestsWithoutRowsAndBeatsWithEachBatch) {
 
 TEST_F(ReportStoreTest, ItsHeartbeatStandsStillWhileWhatItCallsHangs) {
   HangingPreferences hanging;
-  ReportStore store(directory_, json_, hanging, clock_, category_);
+  ReportStore store(directory_, json_, hanging, clock_, accounts_, category_);
   while (!store.heartbeat()->read().isWorking) std::this_thread::yield();
   const std::uint64_t before = store.heartbeat()->read().beats;
   store.record(PowerRow{clock_.now(), 28, "power", {{"n", 1}}});

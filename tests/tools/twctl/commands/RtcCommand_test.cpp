@@ -83,7 +83,8 @@ TEST_F(RtcCommandTest, PrintsNothingThatControlsATerminal) {
     MemoryLog log;
     const LogCategory category(log, "com.orvane.tonewerk", "twrs");
     const MemoryPreferenceStore preferences;
-    ReportStore store(directory_.path("state"), json_, preferences, clock, category);
+    Accounts accounts(990, clock);
+    ReportStore store(directory_.path("state"), json_, preferences, clock, accounts, category);
     auto session = std::make_shared<RtcSessionRecord>();
     session->startedAt = clock.now();
     session->sessionInfo = {{"id\x7F", "a\x1b\n"}};
