@@ -1,0 +1,58 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Tests that no user waits for the work of another one, whatever that one asks for.
+#include <string>
+#include <vector>
+
+#include "system/support/RecordedEvents.h"
+#include "system/support/UsersTest.h"
+
+namespace tonewerk {
+namespace {
+
+class TurnsTest : public UsersTest {};
+
+TEST_F(TurnsTest, AQuietUserAloneIsServedAtOnce) {
+  ASSERT_TRUE(startDaemon());
+  expectBobNotHeldUp();
+}
+
+TEST_F(TurnsTest, AHundredFloodingConnectionsHoldUpNobodyElse) {
+  ASSERT_TRUE(startDaemon());
+  start(kAlice, {"flood", "100"}, "begun");
+  expectBobNotHeldUp();
+}
+
+// The work of one request is done in slices, but the next request of its connection comes after all of them.
+TEST_F(TurnsTest, ARequestAfterABroadcastIsServedAfterAllOfIt) {
+  constexpr ReporterID kSessions = 1'000;
+  ASSERT_TRUE(startDaemon());
+  DaemonClient alice = connectAs(kAlice);
+  for (ReporterID reporterID = 1; reporterID <= kSessions; ++reporterID) {
+    alice.notify("createReportingSession", {Value(reporterID)});
+    alice.notify("startReportingSessionForID", {Value(reporterID)});
+  }
+  // Only the last one is of a service that has a name in the store.
+  alice.create(kSessions + 1, 7);
+  alice.start(kSessions + 1);
+  const auto send = [&](int number, const std::vector<ReporterID>& reporterIDs) {
+    alice.notify("sendMessage",
+                 ReportingClient::messageArguments({{"number", number}}, 4, kTypeStart, reporterIDs));
+  };
+  send(1, {});
+  send(2, {kSessions + 1});
+  send(3, {});
+  alice.notify("stopReportingSessionForID", {Value(kSessions + 1)});
+  send(4, {});
+  alice.stop(kSessions);
+  EXPECT_EQ(daemon.stop(), 0);
+  std::vector<int> numbers;
+  for (const auto& event :
+       RecordedEvents(daemon.storePath()).named("com.orvane.longformaudio.Playback.Start")) {
+    numbers.push_back(event.at("number"));
+  }
+  EXPECT_THAT(numbers, ::testing::ElementsAre(1, 2, 3));
+}
+
+}  // namespace
+}  // namespace tonewerk
