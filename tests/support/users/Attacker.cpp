@@ -36,7 +36,8 @@ std::string messageHead(std::int64_t number) {
          packed::mapHeader(2) + packed::text("n") + packed::integer(number) + packed::text("list");
 }
 std::string messageTail(std::int64_t reporterID) {
-  return packed::integer(kPlayback) + packed::integer(kTypeError) + packed::array({packed::integer(reporterID)});
+  return packed::integer(kPlayback) + packed::integer(kTypeError) +
+         packed::array({packed::integer(reporterID)});
 }
 
 // The bytes that the socket takes at once.
