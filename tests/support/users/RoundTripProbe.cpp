@@ -62,12 +62,16 @@ RoundTripTimes probeRoundTrips(const std::string& socketPath, std::int64_t repor
   times.reserve(static_cast<std::size_t>(plan.duration / plan.interval));
   const Clock::time_point end = Clock::now() + plan.duration;
   bool isAnswered = true;
-  for (Clock::time_point due = Clock::now(); due < end; due += plan.interval) {
+  for (Clock::time_point due = Clock::now(); isAnswered && due < end;) {
     std::this_thread::sleep_until(due);
-    // At the end, requests that are due but not sent yet have waited at least so long.
-    if (Clock::now() < end) isAnswered = isAnswered && ask(client, reporterID, plan.patience);
-    times.push_back(Clock::now() - due);
-    if (!isAnswered) times.back() = std::max<std::chrono::nanoseconds>(times.back(), plan.patience);
+    const Clock::time_point sent = Clock::now();
+    isAnswered = ask(client, reporterID, plan.patience);
+    const Clock::time_point answered = Clock::now();
+    // Also those that would have been sent meanwhile.
+    for (Clock::time_point asked = sent; asked < answered; asked += plan.interval) {
+      times.push_back(answered - asked);
+    }
+    due = std::max(due + plan.interval, answered);
   }
   return RoundTripTimes(std::move(times));
 }

@@ -9,18 +9,17 @@
 
 namespace tonewerk {
 
-// How a quiet client asks: one request after the other, one due in each interval. When answers come late,
-// requests that are due at the end of the duration are not sent any more.
+// How a quiet client asks: one request after the other, one in each interval, or as soon as the last one is
+// answered when that takes longer.
 struct ProbePlan {
   std::chrono::microseconds interval{2'000};
   std::chrono::milliseconds duration{3'000};
-  // How long to wait for one answer. Then the client gives up, and no later request is answered either.
+  // How long to wait for one answer. Then the client gives up.
   std::chrono::milliseconds patience{20'000};
 };
 
-// The times from when each request was due until its answer came, sorted. A standstill so counts for every
-// request that falls into it, and not only for the one that happens to wait. What was not sent counts as
-// answered at the end.
+// How long answers took, sorted. During a long wait each interval counts as a request that was sent then, so
+// that a standstill has the weight of its length, and is not one request among many.
 class RoundTripTimes {
  public:
   explicit RoundTripTimes(std::vector<std::chrono::nanoseconds> times);
