@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // Tests that no user waits for the work of another one, whatever that one asks for.
+#include <filesystem>
 #include <string>
 #include <vector>
 
@@ -10,11 +11,45 @@
 namespace tonewerk {
 namespace {
 
-class TurnsTest : public UsersTest {};
+constexpr std::size_t kMegabyte = std::size_t{1} << 20;
+
+class TurnsTest : public UsersTest {
+ protected:
+  // Does not wait until everything that Alice has asked for is done.
+  void endAtOnce() { daemon.process().kill(); }
+
+  // The bytes of the store's files.
+  std::size_t storeBytes() const {
+    std::size_t bytes = 0;
+    for (const char* suffix : {"", "-wal"}) {
+      std::error_code error;
+      const auto size = std::filesystem::file_size(daemon.storePath() + suffix, error);
+      if (!error) bytes += size;
+    }
+    return bytes;
+  }
+};
 
 TEST_F(TurnsTest, AQuietUserAloneIsServedAtOnce) {
   ASSERT_TRUE(startDaemon());
   expectBobNotHeldUp();
+}
+
+TEST_F(TurnsTest, AMessageThatNamesASessionThousandsOfTimesHoldsUpNobodyElse) {
+  daemon.writeConfiguration("preferences/com.orvane.tonewerk.store.toml", "max_megabytes = 16\n");
+  ASSERT_TRUE(startDaemon());
+  start(kAlice, {"often", "1000000", "4096", "1"}, "begun");
+  expectBobNotHeldUp();
+  // The file, its write-ahead log, and what is written at once.
+  EXPECT_LT(storeBytes(), (16 + 8 + 4) * kMegabyte);
+  endAtOnce();
+}
+
+TEST_F(TurnsTest, ABroadcastToThousandsOfSessionsHoldsUpNobodyElse) {
+  ASSERT_TRUE(startDaemon());
+  start(kAlice, {"broadcast", "4090", "3500", "0"}, "begun");
+  expectBobNotHeldUp();
+  endAtOnce();
 }
 
 TEST_F(TurnsTest, AHundredFloodingConnectionsHoldUpNobodyElse) {
@@ -52,6 +87,14 @@ TEST_F(TurnsTest, ARequestAfterABroadcastIsServedAfterAllOfIt) {
     numbers.push_back(event.at("number"));
   }
   EXPECT_THAT(numbers, ::testing::ElementsAre(1, 2, 3));
+}
+
+TEST_F(TurnsTest, AUserWhoLeavesThousandsOfSessionsHoldsUpNobodyElse) {
+  ASSERT_TRUE(startDaemon());
+  start(kAlice, {"sessions", "4096"}).kill();
+  expectBobNotHeldUp();
+  DaemonClient root = connect();
+  EXPECT_TRUE(waitUntil([&] { return root.allReporters().empty(); }));
 }
 
 }  // namespace
