@@ -69,7 +69,7 @@ void startSession(ReportingClient& client, std::size_t number) {
 
 // Messages for one session that differ from each other, so that none is redundant.
 std::string floodOf(std::int64_t reporterID) {
-  constexpr int kDifferent = 500;
+  constexpr int kDifferent = 100;
   std::string bytes;
   for (int number = 0; number < kDifferent; ++number) {
     RpcWriter(bytes).notification(
@@ -122,6 +122,7 @@ void Attacker::openFlood(std::size_t connections) {
   for (std::size_t at = 0; at < connections; ++at) {
     others_.push_back(connect());
     startSession(*others_.back(), at);
+    floods_.push_back(floodOf(kFirstReporterID + static_cast<std::int64_t>(at)));
   }
 }
 
@@ -130,7 +131,7 @@ void Attacker::flood() {
   std::vector<pollfd> polled;
   for (std::size_t at = 0; at < others_.size(); ++at) {
     const int socket = others_[at]->fileDescriptor();
-    streams.push_back({socket, floodOf(kFirstReporterID + static_cast<std::int64_t>(at))});
+    streams.push_back({socket, floods_[at]});
     polled.push_back({socket, POLLOUT, 0});
   }
   for (;;) {

@@ -40,7 +40,7 @@ class Attacker {
   // a small message that names `count` sessions that do not exist.
   void nameUnknown(std::size_t count);
 
-  // Opens so many connections, with a started session each.
+  // Opens so many connections, with a started session each, and makes their messages.
   void openFlood(std::size_t connections);
   // Floods the daemon with small messages over these, for ever.
   [[noreturn]] void flood();
@@ -67,8 +67,9 @@ class Attacker {
   void sendMessage(ValueMap message, const std::vector<std::int64_t>& reporterIDs);
 
   const std::string socketPath_;
-  Client client_;               // the connection with sessions
-  std::vector<Client> others_;  // openFlood() opens them in the order of their sessions
+  Client client_;                    // the connection with sessions
+  std::vector<Client> others_;       // openFlood() opens them in the order of their sessions
+  std::vector<std::string> floods_;  // what each of them sends
   std::int64_t sent_ = 0;
 };
 
