@@ -6,6 +6,7 @@
 #include <string>
 #include <vector>
 
+#include "support/OtherUser.h"
 #include "system/support/RecordedEvents.h"
 #include "system/support/UsersTest.h"
 
@@ -14,7 +15,9 @@ namespace {
 
 using ::testing::ElementsAre;
 using ::testing::IsEmpty;
+using ::testing::SizeIs;
 
+constexpr std::int64_t kNotPermitted = 4;
 constexpr AudioServiceType kNoService = 65'535;
 constexpr AudioServiceType kTelephony = 2;
 constexpr AudioServiceType kLongFormAudio = 7;
@@ -130,6 +133,29 @@ TEST_F(SeparationTest, ClientsOfOneUserReachEachOthersSessions) {
   EXPECT_EQ(validIdentifier(second, 77), 77);
 }
 
+TEST_F(SeparationTest, OnlyTrustedUsersMayWatch) {
+  ASSERT_TRUE(daemon.writeConfiguration("preferences/com.orvane.tonewerk.service.toml",
+                                        "trusted_users = [" + std::to_string(kBob) + "]\n"));
+  ASSERT_TRUE(startDaemon());
+  DaemonClient alice = connectAs(kAlice);
+  const Answer refused = alice.call("watch.sessions", {Value(0)});
+  EXPECT_EQ(refused.error.value_or(ReplyError()).code, kNotPermitted);
+  DaemonClient bob = connectAs(kBob);
+  EXPECT_FALSE(bob.call("watch.sessions", {Value(0)}).error);
+}
+
+TEST_F(SeparationTest, UsersThatThePreferenceNamesReachAllSessions) {
+  ASSERT_TRUE(daemon.writeConfiguration("preferences/com.orvane.tonewerk.service.toml",
+                                        "trusted_users = [\"nobody\", " + std::to_string(kBob) + "]\n"));
+  ASSERT_TRUE(startDaemon());
+  DaemonClient alice = withSession(kAlice, 78, kLongFormAudio);
+  DaemonClient byNumber = withSession(kBob, 77, kTelephony);
+  DaemonClient byName = connectAs(kOtherUser);
+  EXPECT_THAT(byNumber.allReporters(), SizeIs(2));
+  EXPECT_THAT(byName.allReporters(), SizeIs(2));
+  EXPECT_THAT(alice.allReporters(), ElementsAre(78));
+}
+
 TEST_F(SeparationTest, OnlyATrustedUserMayEndTheDaemon) {
   ASSERT_TRUE(startDaemon());
   DaemonClient witness = withSession(kBob, 77, kTelephony);
@@ -143,6 +169,17 @@ TEST_F(SeparationTest, OnlyATrustedUserMayEndTheDaemon) {
 
   UserProcess root(daemon, 0, {"ask", "killService"});
   EXPECT_EQ(root.outputAtEnd(), "gone\n");
+  EXPECT_EQ(daemon.process().wait(), 2);
+}
+
+TEST_F(SeparationTest, AUserThatThePreferenceNamesMayEndTheDaemon) {
+  ASSERT_TRUE(daemon.writeConfiguration("preferences/com.orvane.tonewerk.service.toml",
+                                        "trusted_users = [" + std::to_string(kBob) + "]\n"));
+  ASSERT_TRUE(startDaemon());
+  UserProcess refused(daemon, kAlice, {"ask", "killService"});
+  EXPECT_EQ(refused.outputAtEnd(), "error 4\n");
+  UserProcess bob(daemon, kBob, {"ask", "killService"});
+  EXPECT_EQ(bob.outputAtEnd(), "gone\n");
   EXPECT_EQ(daemon.process().wait(), 2);
 }
 

@@ -52,6 +52,12 @@ TEST_F(TurnsTest, ABroadcastToThousandsOfSessionsHoldsUpNobodyElse) {
   endAtOnce();
 }
 
+TEST_F(TurnsTest, ALongRequestUnderWayDoesNotKeepTheDaemonFromEndingInOrder) {
+  ASSERT_TRUE(startDaemon());
+  start(kAlice, {"often", "1000000", "4096", "1"}, "begun");
+  EXPECT_EQ(daemon.stop(), 0);
+}
+
 TEST_F(TurnsTest, AHundredFloodingConnectionsHoldUpNobodyElse) {
   ASSERT_TRUE(startDaemon());
   start(kAlice, {"flood", "100"}, "begun");
