@@ -162,6 +162,14 @@ TWReportingDriverUtility::Snapshot TWReportingDriverUtility::getSnapShot() const
   return snapshot;
 }
 
+std::uint64_t TWReportingDriverUtility::ownBytesOf(const Snapshot& snapshot) {
+  std::uint64_t bytes = 0;
+  for (const auto& [driver, samples] : snapshot) {
+    bytes += sizeof(Snapshot::value_type) + driver.size() + samples->ownBytes();
+  }
+  return bytes;
+}
+
 void TWReportingDriverUtility::sendDriverLogsForSession(TWReportingSession* session,
                                                         const Snapshot* driverSnapShot) const {
   Stats stats;

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <cstdint>
 #include <map>
 #include <memory>
 #include <optional>
@@ -42,6 +43,8 @@ class TWReportingDriverUtility {
   }
 
   Snapshot getSnapShot() const;
+  // What a snapshot holds of its own: lists of references to records. The records belong to their sources.
+  static std::uint64_t ownBytesOf(const Snapshot& snapshot);
 
   // Sends what changed since `driverSnapShot`: one message for counters, then one for histograms, then one
   // for states, and none for a kind without entries. If either argument is null, it takes samples and sends

@@ -5,6 +5,7 @@
 #include <optional>
 
 #include "driver/TWReportingDriverUtility.h"
+#include "platform/accounts/Account.h"
 #include "session/TWReportingSessionWorkerClass.h"
 
 namespace tonewerk {
@@ -21,16 +22,20 @@ class TWReportingSessionDriverSnapshotWorker final : public TWReportingSessionWo
     session = owner;
   }
 
-  // Takes the snapshot, which replaces an earlier one. Returns true always.
+  // Takes the snapshot, which replaces an earlier one, and charges it to the user for whom the thread works.
+  // When that user's share has no room, there is no snapshot. Returns true always.
   [[nodiscard]] std::optional<bool> start() override;
   // Sends the session what changed since the snapshot, then drops the snapshot. Sends nothing without a
   // snapshot.
   void stop() override;
 
-  // nullopt before start() and after stop().
+  // nullopt before start() and after stop(), and when there was no room for it.
   const std::optional<TWReportingDriverUtility::Snapshot>& driverSnapShot() const { return driverSnapShot_; }
 
  private:
+  void dropSnapshot();
+
+  Charge charge_;  // for the snapshot, and so destroyed after it
   std::optional<TWReportingDriverUtility::Snapshot> driverSnapShot_;
 };
 

@@ -82,6 +82,9 @@ class ChanmeterSample {
 class ChanmeterSamples {
  public:
   virtual ~ChanmeterSamples() = default;
+
+  // The bytes that these samples hold of their own, without those that they share with other samples.
+  virtual std::uint64_t ownBytes() const = 0;
 };
 
 class Chanmeter {

@@ -3,9 +3,12 @@
 
 #include <algorithm>
 #include <gtest/gtest.h>
+#include <memory>
 #include <thread>
+#include <vector>
 
 #include "driver/DriverTest.h"
+#include "platform/accounts/WorkingFor.h"
 #include "workers/TWReportingWorkerClasses.h"
 
 namespace tonewerk {
@@ -175,6 +178,113 @@ TEST_F(TWReportingSessionDriverSnapshotWorkerTest,
   EXPECT_EQ(chanmeter.heldSamples(), 0U);
 }
 
+// Tests what a snapshot costs the user for whom its session starts.
+class DriverSnapshotChargeTest : public TWReportingSessionDriverSnapshotWorkerTest {
+ protected:
+  static constexpr Resource kSnapshots = Resource::kSnapshotBytes;
+  using Worker = TWReportingSessionDriverSnapshotWorker;
+
+  DriverSnapshotChargeTest() { setChannels(100); }
+
+  void setChannels(std::size_t count) {
+    std::vector<ChanmeterRecord> records;
+    for (std::size_t number = 0; number < count; ++number)
+      records.push_back(simple(speaker(std::to_string(number)), 1));
+    chanmeter.setRecords(std::move(records));
+  }
+  void startFor(const std::shared_ptr<Account>& account, Worker& started) {
+    const WorkingFor scope(account);
+    EXPECT_EQ(started.start(), true);
+  }
+  std::uint64_t held() const { return user->held(kSnapshots); }
+  std::uint64_t held(const std::shared_ptr<Account>& account) const { return account->held(kSnapshots); }
+
+  const std::shared_ptr<Account> user = test.accounts.of(1001);
+};
+
+TEST_F(DriverSnapshotChargeTest, ASnapshotIsChargedToTheUserOfItsSessionUntilItStops) {
+  startFor(user, worker);
+  EXPECT_GE(held(), 100 * sizeof(ChanmeterRecords::value_type));
+  EXPECT_LE(held(), 2 * 100 * sizeof(ChanmeterRecords::value_type)) << "the records themselves are not";
+  EXPECT_EQ(test.accounts.totals().held(kSnapshots), held());
+  worker.stop();
+  EXPECT_EQ(held(), 0U);
+}
+
+TEST_F(DriverSnapshotChargeTest, EachOfTwoSnapshotsIsChargedAndGivenBackWithItsWorker) {
+  startFor(user, worker);
+  const std::uint64_t one = held();
+  {
+    Worker other(session);
+    startFor(user, other);
+    EXPECT_EQ(held(), 2 * one);
+  }
+  EXPECT_EQ(held(), one);
+}
+
+TEST_F(DriverSnapshotChargeTest, ASecondStartChargesTheNewSnapshotInPlaceOfTheFirst) {
+  startFor(user, worker);
+  const std::uint64_t first = held();
+  setChannels(50);  // these were subscribed, too
+  const std::shared_ptr<Account> other = test.accounts.of(1002);
+  startFor(other, worker);
+  EXPECT_EQ(held(), 0U);
+  EXPECT_GT(held(other), 0U);
+  EXPECT_LT(held(other), first);
+}
+
+TEST_F(DriverSnapshotChargeTest, ASecondStartNeedsNoRoomForTheFirstSnapshot) {
+  startFor(user, worker);
+  test.accounts.totals().setTotal(kSnapshots, 2 * held());
+  startFor(user, worker);
+  EXPECT_TRUE(worker.driverSnapShot());
+  EXPECT_EQ(user->refused(kSnapshots), 0U);
+}
+
+TEST_F(DriverSnapshotChargeTest, ASnapshotForNobodyInParticularIsChargedToTheDaemonsOwnUser) {
+  EXPECT_EQ(worker.start(), true);
+  EXPECT_GT(held(test.accounts.own()), 0U);
+  worker.stop();
+  EXPECT_EQ(held(test.accounts.own()), 0U);
+}
+
+TEST_F(DriverSnapshotChargeTest, WithoutRoomThereIsNoSnapshotAndOneErrorLine) {
+  test.accounts.totals().setTotal(kSnapshots, 100);
+  startFor(user, worker);
+  EXPECT_EQ(worker.driverSnapShot(), std::nullopt);
+  EXPECT_EQ(chanmeter.heldSamples(), 0U);
+  EXPECT_EQ(held(), 0U);
+  EXPECT_EQ(user->refused(kSnapshots), 1U);
+  EXPECT_THAT(logged(LogLevel::kError),
+              ElementsAre(testing::MatchesRegex("no driver statistics: [0-9]+ bytes are more than is left of "
+                                                "the share of user 1001. reporterID=77")));
+  setVolts(12);
+  worker.stop();
+  EXPECT_THAT(sentTo(*session), IsEmpty());
+  EXPECT_THAT(logged(LogLevel::kError), SizeIs(1));
+}
+
+TEST_F(DriverSnapshotChargeTest, AUserWithManySessionsLeavesRoomForTheSnapshotsOfOthers) {
+  startFor(user, worker);
+  test.accounts.totals().setTotal(kSnapshots, 20 * held());
+  std::vector<std::unique_ptr<Worker>> many;
+  for (int count = 0; count < 100; ++count) {
+    many.push_back(std::make_unique<Worker>(session));
+    startFor(user, *many.back());
+  }
+  EXPECT_LE(held(), test.accounts.totals().total(kSnapshots) / 2);
+  EXPECT_EQ(many.back()->driverSnapShot(), std::nullopt);
+
+  Worker other(makeSession(78));
+  startFor(test.accounts.of(1002), other);
+  EXPECT_TRUE(other.driverSnapShot());
+
+  many.clear();
+  Worker later(session);
+  startFor(user, later);
+  EXPECT_TRUE(later.driverSnapShot());
+}
+
 // Runs the worker together with the daemon's other workers.
 class DriverStatisticsOfASessionTest : public DriverTest {
  protected:
@@ -191,6 +301,19 @@ TEST_F(DriverStatisticsOfASessionTest, ReachItsConsumersWhileItStops) {
   const auto events = test.metricon.eventsNamed("com.orvane.tonewerk.Chanmetering.Simple");
   ASSERT_THAT(events, SizeIs(1));
   EXPECT_EQ(events[0].integer("Amp_Speaker_Simple_volts"), 2);
+}
+
+TEST_F(DriverStatisticsOfASessionTest, AreMissingWithoutRoomAndTheSessionReportsEverythingElse) {
+  test.accounts.totals().setTotal(Resource::kSnapshotBytes, 10);
+  chanmeter.setRecords({simple(speaker("volts"), 10)});
+  const auto session = makeSession();
+  session->setServiceType(kServiceTest);
+  session->start();
+  session->sendMessage(message({{"key", 1}}, kChanmetering, 17));
+  chanmeter.setRecords({simple(speaker("volts"), 12)});
+  session->stop();
+  EXPECT_THAT(test.metricon.eventsNamed("com.orvane.tonewerk.Chanmetering.Simple"), IsEmpty());
+  EXPECT_THAT(test.metricon.eventsNamed("com.orvane.tonewerk.Chanmetering.Histogram"), SizeIs(1));
 }
 
 }  // namespace

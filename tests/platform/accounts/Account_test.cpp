@@ -2,10 +2,12 @@
 #include "platform/accounts/Account.h"
 
 #include <gtest/gtest.h>
+#include <optional>
 #include <thread>
 #include <vector>
 
 #include "platform/accounts/Accounts.h"
+#include "platform/accounts/ChargeWithinShare.h"
 #include "platform/accounts/WorkingFor.h"
 #include "protocol/RequestSet.h"
 #include "support/manual/ManualClock.h"
@@ -52,6 +54,20 @@ TEST_F(AccountTest, WhatIsGivenBackCanBeTakenAgain) {
   ASSERT_TRUE(first->take(kKept, 500));
   first->give(kKept, 200);
   EXPECT_TRUE(first->take(kKept, 200));
+}
+
+TEST_F(AccountTest, AChargeWithinTheShareTakesItsAmountOnceAndNothingAboveTheShare) {
+  {
+    const std::optional<Charge> charge = chargeWithinShare(first, kKept, 300);
+    ASSERT_TRUE(charge);
+    EXPECT_EQ(charge->amount(), 300U);
+    EXPECT_EQ(first->held(kKept), 300U);
+    EXPECT_FALSE(chargeWithinShare(first, kKept, 201));
+    EXPECT_EQ(first->held(kKept), 300U);
+    EXPECT_EQ(first->refused(kKept), 1U);
+  }
+  EXPECT_EQ(first->held(kKept), 0U);
+  EXPECT_EQ(accounts.totals().held(kKept), 0U);
 }
 
 TEST_F(AccountTest, AChargeIsTakenWhateverTheShare) {
