@@ -77,7 +77,7 @@ struct LinuxPlatform::Adapters {
         notifications(directories.runtime + "/notifications", timers, category),
         diagnostics(directories.state, makeStandardCollectors(logLines), json, preferences, clock, category,
                     {}),
-        chanmeter(directories.runtime + "/channels", category) {}
+        chanmeter(directories.runtime + "/channels", category, {}, &accounts) {}
 
   const std::string logsDirectory;
   SystemClock clock;

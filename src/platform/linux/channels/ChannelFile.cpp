@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <cmath>
 #include <concepts>
+#include <cstdint>
 #include <memory>
 #include <type_traits>
 #include <utility>
@@ -230,23 +231,49 @@ bool parseJson(std::string_view text, JsonTree& json, ChannelFileProblem& proble
   return false;
 }
 
-using Records = std::vector<ChanmeterRecord>;
+// What an allocation takes beside its bytes: the allocator's own data, and what it rounds up.
+constexpr std::uint64_t kAllocationBytes = 16;
 
-// Returns the records one by one; each keeps all of them alive. One allocation instead of one for each.
-ChanmeterRecords oneByOne(const std::shared_ptr<const Records>& all) {
-  ChanmeterRecords records;
-  records.reserve(all->size());
-  for (const ChanmeterRecord& record : *all) records.emplace_back(all, &record);
-  return records;
+std::uint64_t heapBytesOf(const std::string& text) {
+  static const std::size_t kInside = std::string().capacity();
+  return text.capacity() > kInside ? text.capacity() + kAllocationBytes : 0;
+}
+
+std::uint64_t heapBytesOf(const std::optional<std::string>& text) { return text ? heapBytesOf(*text) : 0; }
+
+template <typename T>
+std::uint64_t heapBytesOf(const std::vector<T>& list) {
+  return list.capacity() == 0 ? 0 : list.capacity() * sizeof(T) + kAllocationBytes;
+}
+
+std::uint64_t heapBytesOf(const ChanmeterRecord& record) {
+  std::uint64_t bytes = heapBytesOf(record.key.driver) + heapBytesOf(record.key.group) +
+                        heapBytesOf(record.key.subGroup) + heapBytesOf(record.key.name) +
+                        heapBytesOf(record.unit) + heapBytesOf(record.states) + heapBytesOf(record.buckets);
+  for (const ChanmeterState& state : record.states) bytes += heapBytesOf(state.name);
+  return bytes;
 }
 
 }  // namespace
+
+// One allocation for all records, which each of them keeps alive.
+struct ChannelFile::Held {
+  Charge charge;  // for the records, and so destroyed after them
+  std::vector<ChanmeterRecord> records;
+
+  static ChanmeterRecords oneByOne(const std::shared_ptr<Held>& held) {
+    ChanmeterRecords records;
+    records.reserve(held->records.size());
+    for (const ChanmeterRecord& record : held->records) records.emplace_back(held, &record);
+    return records;
+  }
+};
 
 std::optional<ChannelFile> ChannelFile::parse(std::string_view text, ChannelFileProblem& problem) {
   JsonTree json;
   if (!parseJson(text, json, problem)) return std::nullopt;
   ChannelFile file;
-  const auto all = std::make_shared<Records>();
+  const auto held = std::make_shared<Held>();
   const Place root;
   Reading reading{json, problem};
   ObjectReader reader(reading, json.root(), root);
@@ -255,21 +282,30 @@ std::optional<ChannelFile> ChannelFile::parse(std::string_view text, ChannelFile
     return readChannel(channel, record);
   };
   if (!reader.isObject() || !reader.read("driver", file.driver) ||
-      !reader.readList("channels", *all, readOne)) {
+      !reader.readList("channels", held->records, readOne)) {
     return std::nullopt;
   }
-  file.all_ = all;
-  file.records = oneByOne(all);
+  file.held_ = held;
+  file.records = Held::oneByOne(held);
   file.numbers_ = ChannelNumbers(text, json, std::move(reading.numbers));
   return file;
 }
 
 bool ChannelFile::update(std::string_view previous, std::string_view text) {
-  const auto all = std::make_shared<Records>(*all_);
-  if (!numbers_.read(previous, text, *all)) return false;
-  all_ = all;
-  records = oneByOne(all);
+  const auto held = std::make_shared<Held>();
+  held->records = held_->records;
+  if (!numbers_.read(previous, text, held->records)) return false;
+  held_ = held;
+  records = Held::oneByOne(held);
   return true;
 }
+
+std::uint64_t ChannelFile::recordBytes() const {
+  std::uint64_t bytes = sizeof(Held) + heapBytesOf(held_->records);
+  for (const ChanmeterRecord& record : held_->records) bytes += heapBytesOf(record);
+  return bytes;
+}
+
+void ChannelFile::keep(Charge charge) { held_->charge = std::move(charge); }
 
 }  // namespace tonewerk

@@ -8,6 +8,7 @@
 #include <string_view>
 #include <vector>
 
+#include "platform/accounts/Account.h"
 #include "platform/chanmeter/ChanmeterRecord.h"
 #include "platform/linux/channels/ChannelNumbers.h"
 
@@ -37,8 +38,15 @@ class ChannelFile {
   // updated again.
   [[nodiscard]] bool update(std::string_view previous, std::string_view text);
 
+  // The bytes of the records of the last parse() or update(), with their texts, states and buckets.
+  std::uint64_t recordBytes() const;
+  // Keeps `charge` as long as anyone holds one of these records, for which it may be called once.
+  void keep(Charge charge);
+
  private:
-  std::shared_ptr<const std::vector<ChanmeterRecord>> all_;  // what `records` point into
+  struct Held;
+
+  std::shared_ptr<Held> held_;  // what `records` point into
   ChannelNumbers numbers_;
 };
 

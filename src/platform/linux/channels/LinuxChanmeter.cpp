@@ -59,6 +59,7 @@ Chanmeter::Samples LinuxChanmeter::createSamplesIn(const Reading& reading, const
            static_cast<const LinuxSubscription&>(*subscription).selectionFor(subscribed), failure);
   if (failure) error = failure;
   if (records.empty() && failure) return nullptr;
+  records.shrink_to_fit();  // a session holds the list until it stops
   return std::make_shared<ChanmeterRecordSamples>(std::move(records));
 }
 

@@ -9,6 +9,8 @@
 
 namespace tonewerk {
 
+class Accounts;
+
 // Provides the channels that drivers and processes publish in files, and channels made from the kernel's
 // status files of sound cards. docs/driver-channels.md describes both. Error codes are those of
 // ChannelFailure.
@@ -20,9 +22,12 @@ namespace tonewerk {
 // have not been read before.
 class LinuxChanmeter final : public RecordChanmeter {
  public:
-  // `root` is the directory of /proc and /sys; empty for the real ones. `log` must outlive this object.
-  LinuxChanmeter(std::string channelsDirectory, const LogCategory& log, const std::string& root = {})
-      : kernel_(root, log), published_(std::move(channelsDirectory), log) {}
+  // `root` is the directory of /proc and /sys; empty for the real ones. `log` and `accounts` must outlive
+  // this object. What is held of published files is charged to their owners; without accounts nothing is
+  // charged. The kernel's channels are not charged, because the hardware bounds them.
+  LinuxChanmeter(std::string channelsDirectory, const LogCategory& log, const std::string& root = {},
+                 Accounts* accounts = nullptr)
+      : kernel_(root, log), published_(std::move(channelsDirectory), log, accounts) {}
 
   [[nodiscard]] Channels copyChannelsInGroup(const std::optional<std::string>& group,
                                              const std::optional<std::string>& subGroup,

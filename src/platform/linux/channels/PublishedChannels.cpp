@@ -8,6 +8,8 @@
 #include <utility>
 
 #include "platform/Log.h"
+#include "platform/accounts/Accounts.h"
+#include "platform/accounts/ChargeWithinShare.h"
 #include "platform/linux/channels/ChannelFailures.h"
 #include "platform/linux/files/TextFile.h"
 #include "platform/linux/files/WholeFile.h"
@@ -147,7 +149,7 @@ ChannelFileProblem PublishedChannels::refresh(const std::string& path, File& fil
   return file.problem;
 }
 
-void PublishedChannels::lookAt(const std::string& path, File& file) {
+void PublishedChannels::lookAt(const std::string& path, File& file) const {
   struct stat status {};
   file.exists = stat(path.c_str(), &status) == 0;
   if (!file.exists) {
@@ -159,7 +161,7 @@ void PublishedChannels::lookAt(const std::string& path, File& file) {
   }
   const auto size = static_cast<std::size_t>(status.st_size);
   file.bytes = S_ISREG(status.st_mode) && size <= kMaxFileBytes ? size : 0;
-  file.isCurrent = file.stamp && FileStamp::of(status) == *file.stamp;
+  file.isCurrent = file.stamp && FileStamp::of(status) == *file.stamp && !hasRoomNow(file);
 }
 
 void PublishedChannels::File::clearContents() {
@@ -168,6 +170,7 @@ void PublishedChannels::File::clearContents() {
   text.clear();
   text.shrink_to_fit();
   parsed.reset();
+  refusedBytes = 0;
 }
 
 void PublishedChannels::readAgain(const std::string& path, File& file, std::string& buffer) {
@@ -178,10 +181,13 @@ void PublishedChannels::readAgain(const std::string& path, File& file, std::stri
     file.clearContents();
     file.problem = error == std::errc::no_such_file_or_directory ? ChannelFileProblem() : problemOf(error);
   } else {
+    // Another owner's records, even the same ones, are for another account.
+    if (std::exchange(file.owner, stamp.owner) != stamp.owner) file.clearContents();
     if (stamp.isSettled()) file.stamp = stamp;
     if (buffer != file.text || buffer.empty()) {
       std::swap(buffer, file.text);
       if (!file.parsed || !file.parsed->update(buffer, file.text)) parseText(file);
+      charge(file);
     }
   }
   file.isCurrent = true;
@@ -193,6 +199,27 @@ void PublishedChannels::parseText(File& file) {
   if (!file.parsed) return;
   file.driver = file.parsed->driver;
   file.layout = ++lastLayout_;
+}
+
+// The records before these no longer count, unless a sample holds them.
+void PublishedChannels::charge(File& file) const {
+  if (accounts_ == nullptr || !file.parsed) return;
+  const std::uint64_t bytes = file.parsed->recordBytes();
+  std::optional<Charge> charge =
+      chargeWithinShare(accounts_->of(file.owner), Resource::kSnapshotBytes, bytes);
+  if (charge) return file.parsed->keep(std::move(*charge));
+  const std::optional<FileStamp> stamp = file.stamp;
+  file.clearContents();
+  file.stamp = stamp;
+  file.refusedBytes = bytes;
+  // The same text as long as there is no room, so that it is logged once.
+  file.problem = {kChannelsTooMany,
+                  "holds more than is left of the share of user " + std::to_string(file.owner)};
+}
+
+bool PublishedChannels::hasRoomNow(const File& file) const {
+  return file.refusedBytes != 0 &&
+         chargeWithinShare(accounts_->of(file.owner), Resource::kSnapshotBytes, file.refusedBytes);
 }
 
 void PublishedChannels::logProblem(const std::string& path, const ChannelFileProblem& problem,

@@ -6,6 +6,7 @@
 #include <map>
 #include <optional>
 #include <string>
+#include <sys/types.h>
 #include <vector>
 
 #include "platform/Chanmeter.h"
@@ -17,11 +18,17 @@
 
 namespace tonewerk {
 
+class Accounts;
+
 // Reads the channels that drivers and processes publish: each file `*.json` of one directory, unless its name
 // begins with a dot, holds the channels of one driver. docs/driver-channels.md describes the format.
 //
 // The contents are kept in memory, so a file that has not changed is neither read nor parsed again. If only
 // its numbers have changed, only these are parsed.
+//
+// What the records of a reading of a file hold is charged to the file's owner (Resource::kSnapshotBytes) as
+// long as anyone holds one of them, because each change of the file may leave records behind that sessions
+// still need. A file for which its owner's share has no room is left out, and read again when there is room.
 //
 // Any thread; concurrent calls wait for each other.
 class PublishedChannels {
@@ -54,9 +61,10 @@ class PublishedChannels {
     std::map<std::string, Places> files_;  // by name
   };
 
-  // `log` must outlive this object. If the directory does not exist, there are no channels.
-  PublishedChannels(std::string directory, const LogCategory& log)
-      : directory_(std::move(directory)), log_(log) {}
+  // `log` and `accounts` must outlive this object. Without accounts nothing is charged. If the directory does
+  // not exist, there are no channels.
+  PublishedChannels(std::string directory, const LogCategory& log, Accounts* accounts = nullptr)
+      : directory_(std::move(directory)), log_(log), accounts_(accounts) {}
 
   // Appends the current records of the chosen channels, in the order of file names and then in the order of
   // each file. A file that cannot be read or does not have the right form is left out as a whole, and is
@@ -78,6 +86,8 @@ class PublishedChannels {
     std::string text;
     std::optional<ChannelFile> parsed;  // from `text`
     std::uint64_t layout = 0;           // differs between texts with other channels; 0 if none was parsed
+    uid_t owner = 0;                    // of the file that has `text`
+    std::uint64_t refusedBytes = 0;     // of its records, if the owner had no room; `text` is then empty
     ChannelFileProblem problem;         // of the file or its text; code 0 for none
     // Kept after a later problem, to tell whose channels are missing.
     std::optional<std::string> driver;
@@ -98,9 +108,13 @@ class PublishedChannels {
   std::vector<std::string> fileNames(std::optional<ChanmeterError>& error) REQUIRES(mutex_);
   [[nodiscard]] ChannelFileProblem refresh(const std::string& path, File& file, Reading& reading, Sums& sums)
       REQUIRES(mutex_);
-  static void lookAt(const std::string& path, File& file);
+  void lookAt(const std::string& path, File& file) const;
   void readAgain(const std::string& path, File& file, std::string& buffer) REQUIRES(mutex_);
   void parseText(File& file) REQUIRES(mutex_);
+  // Charges the new records to the file's owner, or gives them up.
+  void charge(File& file) const;
+  // Whether the owner would have had room at this moment for records that were given up.
+  bool hasRoomNow(const File& file) const;
   static void append(const ChannelChoice& choice, const File& file, ChanmeterRecords& records);
   static void append(const ChannelChoice& choice, const File& file, Selection::Places& selected,
                      ChanmeterRecords& records);
@@ -109,6 +123,7 @@ class PublishedChannels {
 
   const std::string directory_;
   const LogCategory& log_;
+  Accounts* const accounts_;
   Mutex mutex_;
   std::map<std::string, File> files_ GUARDED_BY(mutex_);  // by name
   std::string loggedDirectoryProblem_ GUARDED_BY(mutex_);

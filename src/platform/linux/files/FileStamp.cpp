@@ -13,8 +13,12 @@ std::int64_t nanosecondsOf(const timespec& time) { return time.tv_sec * kSecond 
 }  // namespace
 
 FileStamp FileStamp::of(const struct stat& status) {
-  return {status.st_dev, status.st_ino, status.st_size, nanosecondsOf(status.st_mtim),
-          nanosecondsOf(status.st_ctim)};
+  return {status.st_dev,
+          status.st_ino,
+          status.st_size,
+          nanosecondsOf(status.st_mtim),
+          nanosecondsOf(status.st_ctim),
+          status.st_uid};
 }
 
 bool FileStamp::isSettled() const {

@@ -14,6 +14,7 @@ struct FileStamp {
   off_t size;
   std::int64_t modifiedNanoseconds;
   std::int64_t changedNanoseconds;
+  uid_t owner;  // a change of the owner also changes the status, and so the time above
 
   static FileStamp of(const struct stat& status);
   // Whether any later change will change the stamp. File times advance in ticks of some milliseconds, and a
