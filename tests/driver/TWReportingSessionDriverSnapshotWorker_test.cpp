@@ -204,8 +204,9 @@ class DriverSnapshotChargeTest : public TWReportingSessionDriverSnapshotWorkerTe
 
 TEST_F(DriverSnapshotChargeTest, ASnapshotIsChargedToTheUserOfItsSessionUntilItStops) {
   startFor(user, worker);
-  EXPECT_GE(held(), 100 * sizeof(ChanmeterRecords::value_type));
-  EXPECT_LE(held(), 2 * 100 * sizeof(ChanmeterRecords::value_type)) << "the records themselves are not";
+  constexpr std::size_t kReferences = 100 * sizeof(ChanmeterRecords::value_type);
+  EXPECT_GE(held(), kReferences);
+  EXPECT_LE(held(), 2 * kReferences) << "the records themselves are not";
   EXPECT_EQ(test.accounts.totals().held(kSnapshots), held());
   worker.stop();
   EXPECT_EQ(held(), 0U);

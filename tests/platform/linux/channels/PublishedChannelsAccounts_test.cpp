@@ -67,6 +67,7 @@ class PublishedChannelsAccountsTest : public testing::Test {
     publish("one.json", fileOf("One", 1));
     read();
     const std::uint64_t bytes = held();
+    EXPECT_GT(bytes, 0U);
     std::filesystem::remove(path("one.json"));
     read();
     EXPECT_EQ(held(), 0U);
@@ -119,6 +120,7 @@ TEST_F(PublishedChannelsAccountsTest, GivesBackWhenNobodyHoldsARecordAnyMore) {
   publish("a.json", fileOf("One", 1));
   ChanmeterRecords first = read();
   const std::uint64_t one = held();
+  EXPECT_GT(one, 0U);
   publish("a.json", fileOf("One", 2));
   ChanmeterRecords second = read();
   EXPECT_EQ(held(), 2 * one);
@@ -206,6 +208,7 @@ TEST_F(PublishedChannelsAccountsTest, ChargesTheSameTextToItsNewOwner) {
   publish("a.json", fileOf("One", 1));
   read();
   const std::uint64_t one = held();
+  EXPECT_GT(one, 0U);
   publish("a.json", fileOf("One", 1), kOtherUser);
   EXPECT_THAT(read(), SizeIs(kChannels));
   EXPECT_EQ(held(), 0U);
