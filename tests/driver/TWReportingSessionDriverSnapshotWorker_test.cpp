@@ -165,6 +165,7 @@ TEST_F(TWReportingSessionDriverSnapshotWorkerTest,
   for (std::size_t i = 0; i < kSessions; ++i)
     sessions.push_back(makeSession(static_cast<ReporterID>(100 + i)));
   std::vector<std::thread> threads;
+  threads.reserve(sessions.size());
   for (const auto& owner : sessions) {
     threads.emplace_back([&owner] {
       const auto& sampler = TWReportingContext::current().singletons().get<TWReportingDriverUtility>();
