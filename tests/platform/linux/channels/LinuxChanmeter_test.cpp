@@ -5,13 +5,16 @@
 #include <filesystem>
 #include <fstream>
 #include <gmock/gmock.h>
+#include <memory>
 #include <string>
 #include <thread>
+#include <unistd.h>
 #include <vector>
 
 #include "platform/linux/channels/ChannelFailures.h"
 #include "platform/linux/channels/SoundTree.h"
 #include "support/TemporaryDirectory.h"
+#include "support/TestAccounts.h"
 #include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
@@ -64,7 +67,9 @@ class LinuxChanmeterTest : public testing::Test {
   TemporaryDirectory directory_;
   MemoryLog log_;
   const LogCategory category_{log_, "com.orvane.tonewerk", "twrs"};
-  LinuxChanmeter chanmeter_{directory_.path("channels"), category_, tree_.root()};
+  TestAccounts accounts_;
+  LinuxChanmeter chanmeter_{directory_.path("channels"), category_, tree_.root(),
+                            &static_cast<Accounts&>(accounts_)};
   std::optional<ChanmeterError> error_;
 };
 
@@ -208,7 +213,7 @@ TEST_F(LinuxChanmeterTest, GivesASetTogetherWithAnError) {
 }
 
 // A publisher replaces its file repeatedly while several threads take samples. Each sample must be one
-// complete published state, and no call may fail.
+// complete published state, and no call may fail. What they held is given back on those threads.
 TEST_F(LinuxChanmeterTest, SamplesWholeFilesWhileTheyAreReplaced) {
   constexpr int kChannels = 200;
   const auto fileAt = [](int value) {
@@ -249,6 +254,11 @@ TEST_F(LinuxChanmeterTest, SamplesWholeFilesWhileTheyAreReplaced) {
   stop = true;
   publisher.join();
   EXPECT_THAT(log_.textsOf("twrs", LogLevel::kError), IsEmpty());
+  const std::shared_ptr<Account> owner = accounts_->of(::geteuid());
+  EXPECT_GT(owner->held(Resource::kSnapshotBytes), 0U);
+  std::filesystem::remove(directory_.path("channels/amp.json"));
+  EXPECT_TRUE(samplesOf(channels));
+  EXPECT_EQ(owner->held(Resource::kSnapshotBytes), 0U);
 }
 
 }  // namespace
