@@ -249,6 +249,7 @@ TEST_F(LinuxChanmeterTest, SamplesWholeFilesWhileTheyAreReplaced) {
     }
   };
   std::vector<std::thread> samplers;
+  samplers.reserve(3);
   for (int number = 0; number < 3; ++number) samplers.emplace_back(sample);
   for (std::thread& sampler : samplers) sampler.join();
   stop = true;
