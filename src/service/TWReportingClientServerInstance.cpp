@@ -57,19 +57,18 @@ bool TWReportingClientServerInstance::isReachedBy(const Account& requester) cons
 template <typename Body>
 void TWReportingClientServerInstance::onWorkQueue(ServiceRequest request, Body body) {
   if (TWReportingUtilityGetReportingServerQueue().isCurrent()) {
-    if (const Delegate delegate = delegate_.lock()) body(*this, delegate, request);
+    if (const Delegate delegate = delegate_.lock()) body(*this, delegate, request.reply);
     return;
   }
   TWReportingContext::current().turns().add(
       account_, [self = shared_from_this(), request = std::move(request), body = std::move(body)]() mutable {
-        if (const Delegate delegate = self->delegate_.lock()) body(*self, delegate, request);
+        if (const Delegate delegate = self->delegate_.lock()) body(*self, delegate, request.reply);
         return TurnQueue::Progress::kDone;
       });
 }
 
 void TWReportingClientServerInstance::createReportingSession(ReporterID reporterID, ServiceRequest request) {
-  onWorkQueue(std::move(request), [reporterID](auto& self, const Delegate&, const ServiceRequest& request) {
-    const Reply& reply = request.reply;
+  onWorkQueue(std::move(request), [reporterID](auto& self, const Delegate&, const Reply& reply) {
     const TracedRequest traced(TWReportingTracePoint::kRequestCreate, reporterID);
     debugLog(category(), "creating session for reporter %lli", reporterID);
     const SessionMap& sessions = self.clientReportingSessionMap_;
@@ -88,16 +87,15 @@ void TWReportingClientServerInstance::createReportingSession(ReporterID reporter
 
 void TWReportingClientServerInstance::setServiceType(AudioServiceType serviceType,
                                                      ReporterID reportingSession, ServiceRequest request) {
-  onWorkQueue(std::move(request), [serviceType, reportingSession](auto& self, const Delegate&,
-                                                                  const ServiceRequest& request) {
-    const Reply& reply = request.reply;
-    debugLog(category(), "setting service type %i for reporter %lli", serviceType, reportingSession);
-    if (const Session session = self.ownSession(reportingSession)) {
-      self.changeServiceType(serviceType, session);
-      debugLog(category(), "service type %i set for reporter  %lli", serviceType, reportingSession);
-    }
-    reply(std::nullopt, true);
-  });
+  onWorkQueue(
+      std::move(request), [serviceType, reportingSession](auto& self, const Delegate&, const Reply& reply) {
+        debugLog(category(), "setting service type %i for reporter %lli", serviceType, reportingSession);
+        if (const Session session = self.ownSession(reportingSession)) {
+          self.changeServiceType(serviceType, session);
+          debugLog(category(), "service type %i set for reporter  %lli", serviceType, reportingSession);
+        }
+        reply(std::nullopt, true);
+      });
 }
 
 // A session reports for one service. A change of the type therefore makes a new session, not started, with
@@ -119,8 +117,7 @@ void TWReportingClientServerInstance::changeServiceType(AudioServiceType service
 
 void TWReportingClientServerInstance::getServiceNameForReporterID(ReporterID reporterID,
                                                                   ServiceRequest request) {
-  onWorkQueue(std::move(request), [reporterID](auto& self, const Delegate&, const ServiceRequest& request) {
-    const Reply& reply = request.reply;
+  onWorkQueue(std::move(request), [reporterID](auto& self, const Delegate&, const Reply& reply) {
     debugLog(category(), "fetching seviceType");
     // Identifier 0 is answered twice, because clients rely on the first answer.
     if (reporterID == 0) reply(std::nullopt, kServiceUnknown);
@@ -134,8 +131,7 @@ void TWReportingClientServerInstance::getServiceNameForReporterID(ReporterID rep
 void TWReportingClientServerInstance::setConfiguration(ValueMap configuration, ReporterID reporterID,
                                                        ServiceRequest request) {
   onWorkQueue(std::move(request), [configuration = std::move(configuration), reporterID](
-                                      auto& self, const Delegate&, const ServiceRequest& request) {
-    const Reply& reply = request.reply;
+                                      auto& self, const Delegate&, const Reply& reply) {
     debugLog(category(), "setting configuration");
     const Session session = self.ownSession(reporterID);
     if (session != nullptr && !session->updateConfigurationWithContentsOfConfiguration(&configuration)) {
@@ -147,23 +143,21 @@ void TWReportingClientServerInstance::setConfiguration(ValueMap configuration, R
 
 void TWReportingClientServerInstance::startReportingSessionForID(ReporterID reporterID,
                                                                  ServiceRequest request) {
-  onWorkQueue(std::move(request),
-              [reporterID](auto& self, const Delegate& delegate, const ServiceRequest& request) {
-                const Reply& reply = request.reply;
-                const TracedRequest traced(TWReportingTracePoint::kRequestStart, reporterID);
-                debugLog(category(), "starting session for reporter %lli", reporterID);
-                const Session session = self.ownSession(reporterID);
-                if (session == nullptr) return reply(std::nullopt, true);
-                if (session->started())
-                  return;  // not answered on purpose: the first start's answer counts for both
-                session->start();
-                if (session->transactionCompleteBlock) session->transactionCompleteBlock(std::nullopt, true);
-                session->transactionCompleteBlock = [reply](const std::optional<ReplyError>& error,
-                                                            bool success) { reply(error, success); };
-                if (session->serviceType() == kServiceTest && TWReportingUtilityIsInternalBuild())
-                  reply(std::nullopt, true);
-                delegate->logReportingSessions();
-              });
+  onWorkQueue(std::move(request), [reporterID](auto& self, const Delegate& delegate, const Reply& reply) {
+    const TracedRequest traced(TWReportingTracePoint::kRequestStart, reporterID);
+    debugLog(category(), "starting session for reporter %lli", reporterID);
+    const Session session = self.ownSession(reporterID);
+    if (session == nullptr) return reply(std::nullopt, true);
+    if (session->started()) return;  // not answered on purpose: the first start's answer counts for both
+    session->start();
+    if (session->transactionCompleteBlock) session->transactionCompleteBlock(std::nullopt, true);
+    session->transactionCompleteBlock = [reply](const std::optional<ReplyError>& error, bool success) {
+      reply(error, success);
+    };
+    if (session->serviceType() == kServiceTest && TWReportingUtilityIsInternalBuild())
+      reply(std::nullopt, true);
+    delegate->logReportingSessions();
+  });
 }
 
 void TWReportingClientServerInstance::sendMessage(ValueMap message, AudioEventCategory messageCategory,
@@ -185,11 +179,15 @@ void TWReportingClientServerInstance::sendMessage(ValueMap message, AudioEventCa
     if (delegate == nullptr) return;
     return deliver(delegate, std::move(message), messageCategory, type, reporterIDs, request);
   }
-  onWorkQueue(std::move(request),
-              [message = std::move(message), messageCategory, type, reporterIDs](
-                  auto& self, const Delegate& delegate, ServiceRequest& received) mutable {
-                self.deliver(delegate, std::move(message), messageCategory, type, reporterIDs, received);
-              });
+  TWReportingContext::current().turns().add(
+      account_, [self = shared_from_this(), message = std::move(message), messageCategory, type, reporterIDs,
+                 received = std::move(request)]() mutable {
+        const Delegate delegate = self->delegate_.lock();
+        if (delegate != nullptr) {
+          self->deliver(delegate, std::move(message), messageCategory, type, reporterIDs, received);
+        }
+        return TurnQueue::Progress::kDone;
+      });
 }
 
 struct TWReportingClientServerInstance::Delivery {
@@ -273,50 +271,45 @@ void TWReportingClientServerInstance::deliver(const Delegate& delegate, ValueMap
 
 void TWReportingClientServerInstance::stopReportingSessionForID(ReporterID reporterID,
                                                                 ServiceRequest request) {
-  onWorkQueue(
-      std::move(request), [reporterID](auto& self, const Delegate& delegate, const ServiceRequest& request) {
-        const Reply& reply = request.reply;
-        const TracedRequest traced(TWReportingTracePoint::kRequestStop, reporterID);
-        debugLog(category(), "stopping session for reporter %lli", reporterID);
-        if (reporterID == 0) return reply(std::nullopt, true);
-        const Session session = self.ownSession(reporterID);
-        if (session != nullptr && session->started()) {
-          session->stop();
-          if (session->transactionCompleteBlock) session->transactionCompleteBlock(std::nullopt, true);
-          session->transactionCompleteBlock = nullptr;
-          delegate->logReportingSessions();
-        } else {
-          if (session != nullptr) session->logUnkeptMessages();
-          debugLog(category(),
-                   "Stop called, but session==nil or session.started==false. reporterID=%lli session=%@ "
-                   "session.started=%i",
-                   reporterID, session, session != nullptr && session->started());
-        }
-        debugLog(category(), "stopping %lli", reporterID);
-        reply(std::nullopt, true);
-      });
+  onWorkQueue(std::move(request), [reporterID](auto& self, const Delegate& delegate, const Reply& reply) {
+    const TracedRequest traced(TWReportingTracePoint::kRequestStop, reporterID);
+    debugLog(category(), "stopping session for reporter %lli", reporterID);
+    if (reporterID == 0) return reply(std::nullopt, true);
+    const Session session = self.ownSession(reporterID);
+    if (session != nullptr && session->started()) {
+      session->stop();
+      if (session->transactionCompleteBlock) session->transactionCompleteBlock(std::nullopt, true);
+      session->transactionCompleteBlock = nullptr;
+      delegate->logReportingSessions();
+    } else {
+      if (session != nullptr) session->logUnkeptMessages();
+      debugLog(category(),
+               "Stop called, but session==nil or session.started==false. reporterID=%lli session=%@ "
+               "session.started=%i",
+               reporterID, session, session != nullptr && session->started());
+    }
+    debugLog(category(), "stopping %lli", reporterID);
+    reply(std::nullopt, true);
+  });
 }
 
 void TWReportingClientServerInstance::destroyReportingSession(ReporterID reporterID, ServiceRequest request) {
-  onWorkQueue(std::move(request),
-              [reporterID](auto& self, const Delegate& delegate, const ServiceRequest& request) {
-                const Reply& reply = request.reply;
-                const TracedRequest traced(TWReportingTracePoint::kRequestDestroy, reporterID);
-                debugLog(category(), "destroying session for reporter %lli", reporterID);
-                if (reporterID == 0) return reply(std::nullopt, true);
-                if (const Session session = self.ownSession(reporterID)) {
-                  if (session->started()) session->stop();
-                  self.removeSession(reporterID);
-                }
-                debugLog(category(), "destroying %lli", reporterID);
-                delegate->logReportingSessions();
-                reply(std::nullopt, true);
-              });
+  onWorkQueue(std::move(request), [reporterID](auto& self, const Delegate& delegate, const Reply& reply) {
+    const TracedRequest traced(TWReportingTracePoint::kRequestDestroy, reporterID);
+    debugLog(category(), "destroying session for reporter %lli", reporterID);
+    if (reporterID == 0) return reply(std::nullopt, true);
+    if (const Session session = self.ownSession(reporterID)) {
+      if (session->started()) session->stop();
+      self.removeSession(reporterID);
+    }
+    debugLog(category(), "destroying %lli", reporterID);
+    delegate->logReportingSessions();
+    reply(std::nullopt, true);
+  });
 }
 
 void TWReportingClientServerInstance::reporterIDValid(ReporterID reporterID, ServiceRequest request) {
-  onWorkQueue(std::move(request), [reporterID](auto& self, const Delegate&, const ServiceRequest& request) {
-    const Reply& reply = request.reply;
+  onWorkQueue(std::move(request), [reporterID](auto& self, const Delegate&, const Reply& reply) {
     debugLog(category(), "validating reporter %lli", reporterID);
     ValueMap validity{{TWReporterProxyKeyReporterID, 0}, {TWReporterProxyKeyServiceType, kServiceUnknown}};
     if (const Session session = self.findReportingSessionForID(reporterID, true)) {
@@ -329,8 +322,7 @@ void TWReportingClientServerInstance::reporterIDValid(ReporterID reporterID, Ser
 }
 
 void TWReportingClientServerInstance::getAllReporters(ServiceRequest request) {
-  onWorkQueue(std::move(request), [](auto& self, const Delegate& delegate, const ServiceRequest& request) {
-    const Reply& reply = request.reply;
+  onWorkQueue(std::move(request), [](auto& self, const Delegate& delegate, const Reply& reply) {
     std::vector<Value> reporters;
     for (const auto& client : delegate->getAllClients()) {
       if (!client->isReachedBy(*self.account_)) continue;
@@ -351,8 +343,7 @@ void TWReportingClientServerInstance::killService() {
 
 void TWReportingClientServerInstance::observe(ServiceRequest request) {
   isOnlooker_ = true;
-  onWorkQueue(std::move(request), [](auto& self, const Delegate&, const ServiceRequest& request) {
-    const Reply& reply = request.reply;
+  onWorkQueue(std::move(request), [](auto& self, const Delegate&, const Reply& reply) {
     debugLog(category(), "client %i looks on", self.processIdentifier_);
     reply(std::nullopt, true);
   });

@@ -115,7 +115,7 @@ TEST_F(TWReportingServiceExportTest, RequestsThatOnlyReadAreQuick) {
   for (std::size_t method = 0; method < requests::kAll.size(); ++method) {
     const std::string_view name = requests::kAll[method].name;
     const bool onlyReads = name == "getServiceNameForReporterID" || name == "reporterIDValid" ||
-                           name == "getAllReporters" || name == "observe";
+                           name == "getAllReporters" || name == "observe" || name == "watch.accounts";
     EXPECT_EQ(object->isQuick(method, nullptr), onlyReads) << name;
   }
 }

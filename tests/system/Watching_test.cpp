@@ -244,7 +244,7 @@ TEST_F(TopOnATerminalTest, RefreshesUntilQIsPressed) {
   ASSERT_TRUE(terminal.waitFor("com.example.phone"));
   EXPECT_EQ(terminal.modes().c_lflag & ICANON, 0U);
   client.setConfiguration(kSession, {{"HostApplicationDisplayID", "com.example.\x1b[31mred"}});
-  ASSERT_TRUE(terminal.waitFor("com.example.?[31mred"));
+  ASSERT_TRUE(terminal.waitFor("com.example.\\u001b[31mred"));
   EXPECT_TRUE(tool.isRunning());
   terminal.press("xq");
   EXPECT_EQ(tool.wait(), 0);

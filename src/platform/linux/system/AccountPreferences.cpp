@@ -44,18 +44,21 @@ std::optional<std::uint32_t> userOf(const Value& value) {
 
 std::set<std::uint32_t> trustedUsers(const PreferenceStore& preferences, const LogCategory& log) {
   std::set<std::uint32_t> users;
-  const std::optional<Value> listed = preferences.read(kServiceDomain, kTrustedUsersKey);
+  const std::optional<Value> listed =
+      preferences.read(AccountPreferences::kPreferenceDomain, AccountPreferences::kTrustedUsersKey);
   if (!listed) return users;
   const ValueArray* list = listed->asArray();
   if (list == nullptr) {
-    errorLog(log, "%@ of %@ is no array: %@", kTrustedUsersKey, kServiceDomain, *listed);
+    errorLog(log, "%@ of %@ is no array: %@", AccountPreferences::kTrustedUsersKey,
+             AccountPreferences::kPreferenceDomain, *listed);
     return users;
   }
   for (const Value& value : *list) {
     if (const auto user = userOf(value)) {
       users.insert(*user);
     } else {
-      errorLog(log, "%@ of %@ names no user of this system: %@", kTrustedUsersKey, kServiceDomain, value);
+      errorLog(log, "%@ of %@ names no user of this system: %@", AccountPreferences::kTrustedUsersKey,
+               AccountPreferences::kPreferenceDomain, value);
     }
   }
   return users;
@@ -64,7 +67,7 @@ std::set<std::uint32_t> trustedUsers(const PreferenceStore& preferences, const L
 // None when there is no preference, or it is no number from 1.
 std::optional<std::uint64_t> totalOf(const ResourceFacts& facts, const PreferenceStore& preferences,
                                      const LogCategory& log) {
-  const std::optional<Value> set = preferences.read(kServiceDomain, facts.preference);
+  const std::optional<Value> set = preferences.read(AccountPreferences::kPreferenceDomain, facts.preference);
   if (!set) return std::nullopt;
   const bool isNumber =
       set->asInteger() != nullptr || set->asUnsigned() != nullptr || set->asDouble() != nullptr;
@@ -72,7 +75,8 @@ std::optional<std::uint64_t> totalOf(const ResourceFacts& facts, const Preferenc
   if (isNumber && megabytes >= 1 && megabytes <= std::numeric_limits<std::uint32_t>::max()) {
     return static_cast<std::uint64_t>(megabytes * static_cast<double>(kMiB));
   }
-  errorLog(log, "%@ of %@ is no number from 1: %@", facts.preference, kServiceDomain, *set);
+  errorLog(log, "%@ of %@ is no number from 1: %@", facts.preference, AccountPreferences::kPreferenceDomain,
+           *set);
   return std::nullopt;
 }
 

@@ -592,6 +592,7 @@ class FewDescriptorsTest : public testing::Test {
 TEST_F(FewDescriptorsTest, LeavesHalfOfTheDescriptorsToTheDaemonAndLetsClientsWait) {
   std::string problem;
   UnixSocketListener listener(ServerSocket::open(path, problem), category, accounts);
+  accounts->totals().setTotal(Resource::kConnections, 1000);  // so that one user may have all of them
   listener.setDelegate(delegate);
   listener.resume();
   ::setrlimit(RLIMIT_NOFILE, &before_);

@@ -20,7 +20,7 @@ using testing::IsEmpty;
 class AccountPreferencesTest : public testing::Test {
  protected:
   void set(std::string_view key, const Value& value) {
-    ASSERT_EQ(preferences.write(kServiceDomain, key, value), std::error_code());
+    ASSERT_EQ(preferences.write(AccountPreferences::kPreferenceDomain, key, value), std::error_code());
   }
   void apply() { applyAccountPreferences(accounts, preferences, category); }
   std::uint64_t total(Resource resource) { return accounts->totals().total(resource); }
@@ -76,7 +76,7 @@ TEST_F(AccountPreferencesTest, TotalsAreSetInMebibytesAndFallBack) {
   EXPECT_EQ(total(Resource::kUnfinishedBytes), kMiB + kMiB / 2);
   EXPECT_EQ(total(Resource::kSnapshotBytes), 64 * kMiB);
   EXPECT_THAT(log.textsOf("twrs", LogLevel::kError), ElementsAre(HasSubstr("snapshot_megabytes")));
-  ASSERT_EQ(preferences.remove(kServiceDomain, "kept_megabytes"), std::error_code());
+  ASSERT_EQ(preferences.remove(AccountPreferences::kPreferenceDomain, "kept_megabytes"), std::error_code());
   apply();
   EXPECT_EQ(total(Resource::kKeptBytes), fallback);
 }
@@ -84,7 +84,7 @@ TEST_F(AccountPreferencesTest, TotalsAreSetInMebibytesAndFallBack) {
 TEST_F(AccountPreferencesTest, TheSchemaKnowsTheDefaults) {
   for (const ResourceFacts& facts : kResources) {
     if (facts.preference.empty()) continue;
-    const Preference* preference = findPreference(kServiceDomain, facts.preference);
+    const Preference* preference = findPreference(AccountPreferences::kPreferenceDomain, facts.preference);
     ASSERT_NE(preference, nullptr) << facts.preference;
     EXPECT_EQ(preference->fallback->number() * static_cast<double>(kMiB), static_cast<double>(facts.total));
   }
