@@ -13,11 +13,12 @@ const std::shared_ptr<SessionIndex>& SessionDirectory::indexOf(std::uint32_t use
 }
 
 SessionIndex::Session SessionDirectory::find(ReporterID reporterID, const Account& requester) const {
-  if (requester.isTrusted()) return findAmongAll(reporterID);
   for (const auto& [user, index] : users_) {
-    if (user == requester.user()) return index->find(reporterID);
+    if (user != requester.user()) continue;
+    SessionIndex::Session own = index->find(reporterID);
+    if (own != nullptr || !requester.isTrusted()) return own;
   }
-  return nullptr;
+  return requester.isTrusted() ? findAmongAll(reporterID) : nullptr;
 }
 
 SessionIndex::Session SessionDirectory::findAmongAll(ReporterID reporterID) const {

@@ -22,7 +22,8 @@ class SessionDirectory {
   // The index of one user's sessions. It stays for later clients of the user.
   const std::shared_ptr<SessionIndex>& indexOf(std::uint32_t user);
 
-  // Of several sessions the one of the client that connected first. Null for an unknown identifier.
+  // Of several sessions one of the requester's own user, so that nobody can take a trusted user's messages;
+  // else, or among these, the one of the client that connected first. Null for an unknown identifier.
   SessionIndex::Session find(ReporterID reporterID, const Account& requester) const;
   // Among the sessions of all users.
   SessionIndex::Session findAmongAll(ReporterID reporterID) const;

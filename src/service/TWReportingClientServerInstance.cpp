@@ -29,6 +29,12 @@ constexpr std::string_view kSendSingleMessage = "sendSingleMessage";
 const auto category = &TWReportingServiceDelegateCategory;
 
 ReplyError overBudget(const KeptBytesBudget& budget) {
+  const Account* user = budget.account();
+  if (user != nullptr && !user->hasRoomFor(Resource::kKeptBytes, KeptBytesBudget::kLotBytes)) {
+    return messagingError(
+        kOverLimit, "the user's sessions keep " + std::to_string(user->held(Resource::kKeptBytes)) +
+                        " bytes, the user's share is " + std::to_string(user->share(Resource::kKeptBytes)));
+  }
   return messagingError(kOverLimit, "the connection's sessions keep " + std::to_string(budget.used()) +
                                         " bytes, the most is " + std::to_string(budget.limit()));
 }
@@ -78,6 +84,7 @@ void TWReportingClientServerInstance::createReportingSession(ReporterID reporter
     }
     // An earlier session with this identifier is dropped without a stop, because its client has given it up.
     const Session session = self.makeSession(reporterID);
+    if (!session->takeOwnBytes()) return reply(overBudget(*self.budget_));
     session->setClientProcessName(self.clientProcessName());
     self.setSession(reporterID, session);
     infoLog(category(), "session created for reporter %lli", reporterID);
@@ -108,7 +115,8 @@ void TWReportingClientServerInstance::changeServiceType(AudioServiceType service
   const KeptBytesBudget::Hold hold(*budget_);
   session->leaveBudget();
   const Session replacement = makeSession(session->reporterID());
-  // It fits, because the old session has left the budget.
+  // They fit, because the old session has left the budget.
+  (void)replacement->takeOwnBytes();
   (void)replacement->updateConfigurationWithContentsOfConfiguration(&configuration);
   replacement->takePreviousValuesOf(*session);
   replacement->setServiceType(serviceType);
@@ -259,8 +267,10 @@ void TWReportingClientServerInstance::deliver(const Delegate& delegate, ValueMap
                                           {}});
   if (delivery->sessions.size() > 1) {
     delivery->bytes = delivery->message.bytes();
-    delivery->charge =
-        Charge(account_, Resource::kUnfinishedBytes, delivery->bytes * delivery->sessions.size());
+    // At most the user's share: that is enough to keep its other requests waiting, and leaves others theirs.
+    const std::uint64_t bytes = std::min<std::uint64_t>(delivery->bytes * delivery->sessions.size(),
+                                                        account_->share(Resource::kUnfinishedBytes));
+    delivery->charge = Charge(account_, Resource::kUnfinishedBytes, bytes);
   }
   TurnQueue& turns = TWReportingContext::current().turns();
   while (delivery->run(turns) == TurnQueue::Progress::kMore) {
@@ -384,7 +394,10 @@ void TWReportingClientServerInstance::handleConnectionError() {
       if (at->second->started()) at->second->stop();
       if (turns.isTurnOverAfterLongStep()) return Progress::kMore;
     }
-    while (!sessions.empty()) self->removeSession(sessions.begin()->first);
+    while (!sessions.empty()) {
+      self->removeSession(sessions.begin()->first);
+      if (turns.isTurnOverAfterLongStep()) return Progress::kMore;
+    }
     delegate->removeClient(*self);
     logLine(self->connectionLogLevel(), category(), "removing %i from the server client list",
             self->processIdentifier_);

@@ -199,7 +199,8 @@ bool TWReportingServiceExport::isQuick(std::size_t method, const IncomingMessage
 bool TWReportingServiceExport::isUrgent(std::size_t method) {
   const std::string_view name = requests::kAll[method].name;
   if (name == requests::kObserve.name) hasAskedToObserve_ = true;
-  return name == requests::kKillService.name && (!hasAskedToObserve_ || role_ == Role::kClient);
+  return name == requests::kKillService.name && account_->isTrusted() &&
+         (!hasAskedToObserve_ || role_ == Role::kClient);
 }
 
 void TWReportingServiceExport::handleMessage(std::size_t method, IncomingMessage& message, Reply reply,
@@ -211,6 +212,7 @@ void TWReportingServiceExport::handleMessage(std::size_t method, IncomingMessage
 
 void TWReportingServiceExport::handleRequest(std::size_t method, Arguments arguments, Reply reply,
                                              InFlightToken token) {
+  const WorkingFor scope(account_, lines_.get());
   if (const std::optional<ReplyError> error = takeRole(requests::kAll[method])) return reply(error);
   Incoming incoming{std::move(arguments), std::move(reply), std::move(token)};
   kHandlers[kHandlerOf[method]].run({*object_, *watch_}, incoming);

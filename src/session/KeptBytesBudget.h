@@ -76,9 +76,12 @@ class KeptBytesBudget {
   [[nodiscard]] bool charge(std::size_t bytes) {
     if (account_ == nullptr || bytes <= charged_) return true;
     const std::size_t missing = bytes - charged_;
-    const std::size_t lot = std::max(missing, kLotBytes);
-    if (!account_->take(Resource::kKeptBytes, lot)) return false;
-    charged_ += lot;
+    const bool takesLot = missing < kLotBytes && account_->hasRoomFor(Resource::kKeptBytes, kLotBytes);
+    return takeLot(takesLot ? kLotBytes : missing);
+  }
+  [[nodiscard]] bool takeLot(std::size_t bytes) {
+    if (!account_->take(Resource::kKeptBytes, bytes)) return false;
+    charged_ += bytes;
     return true;
   }
 

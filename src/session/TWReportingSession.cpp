@@ -111,7 +111,14 @@ TWReportingSession::~TWReportingSession() {
 
 std::size_t TWReportingSession::keptBytes() const {
   const MutexLock lock(propertiesMutex_);
-  return messageBytes_ + configuration_.bytes() + previousValues_.bytes();
+  return ownBytes_ + messageBytes_ + configuration_.bytes() + previousValues_.bytes();
+}
+
+bool TWReportingSession::takeOwnBytes() {
+  assert(ownBytes_ == 0);
+  if (!budget_->take(kOwnBytes)) return false;
+  ownBytes_ = kOwnBytes;
+  return true;
 }
 
 void TWReportingSession::leaveBudget() {

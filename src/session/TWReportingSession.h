@@ -59,6 +59,11 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   TWReportingSession& operator=(const TWReportingSession&) = delete;
   ~TWReportingSession();
 
+  // Takes what the session itself takes, about, from the budget: the object and its workers. Returns false
+  // when there is no room. For sessions that clients create; at most once.
+  static constexpr std::size_t kOwnBytes = 4096;
+  [[nodiscard]] bool takeOwnBytes();
+
   void setServiceType(AudioServiceType serviceType);
 
   // Adds the map's entries. Its "QMHostApplicationDisplayID" becomes the application name, unless the map
@@ -219,6 +224,7 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
 
   KeptMessages messages_;
   NewestMessages newest_;
+  std::size_t ownBytes_ = 0;      // taken from the budget for the session itself
   std::size_t messageBytes_ = 0;  // taken from the budget for messages_
   // What clients of other users have paid for messages_. Such clients are rare.
   struct Payment {

@@ -1,11 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <chrono>
+#include <cstddef>
 #include <gmock/gmock.h>
 #include <string>
 #include <vector>
 
 #include "platform/accounts/TurnQueue.h"
 #include "protocol/Requests.h"
+#include "session/TWReportingSessionWorkerClass.h"
+#include "session/TWReportingSessionWorkerConsumerProtocol.h"
 #include "support/ServiceTest.h"
 
 namespace tonewerk {
@@ -26,8 +29,30 @@ Value listOf(const std::vector<ReporterID>& identifiers) {
   return ValueArray(std::move(list));
 }
 
+// Takes longer than a turn for each message and for its stop.
+class SlowWorker final : public TWReportingSessionWorkerConsumerProtocol {
+ public:
+  static const TWReportingSessionWorkerClass kWorkerClass;
+  static inline ManualClock* clock = nullptr;
+
+  explicit SlowWorker(const std::shared_ptr<TWReportingSession>& owner) { session = owner; }
+  const TWReportingSessionWorkerClass& workerClass() const override { return kWorkerClass; }
+  std::optional<bool> start() override { return true; }
+  void stop() override { clock->advance(kTime); }
+  bool handleMessage(const TWReportingSessionMessage& /*message*/) override {
+    clock->advance(kTime);
+    return true;
+  }
+
+ private:
+  static constexpr auto kTime = 2 * TurnQueue::kTurn;
+};
+const TWReportingSessionWorkerClass SlowWorker::kWorkerClass = workerClassOf<SlowWorker>("SlowWorker");
+
 class UserSeparationTest : public ServiceTest {
  protected:
+  UserSeparationTest() : ServiceTest({&SlowWorker::kWorkerClass}) { SlowWorker::clock = &test.clock; }
+
   Arguments messageTo(const Argument& identifiers, std::string text = "hello") {
     return {ValueMap{{"text", std::move(text)}}, kCategory, kType, identifiers};
   }
@@ -148,26 +173,23 @@ TEST_F(UserSeparationTest, OnlyATrustedUserMayEndTheProcess) {
 }
 
 TEST_F(UserSeparationTest, AMessageToManySessionsLetsOthersHaveTheirTurns) {
-  for (ReporterID reporterID = 1; reporterID <= 20; ++reporterID) create(*anna, reporterID);
-  create(*ben, 1);
+  constexpr std::size_t kSessions = 20;
   std::vector<ReporterID> all;
-  for (ReporterID reporterID = 1; reporterID <= 20; ++reporterID) all.push_back(reporterID);
-  std::size_t reachedBefore = 0;
-  TurnQueue& turns = context->turns();
-  // Takes Anna's turn, so that her message gets its sessions one after the other.
-  turns.add(anna_, [&] {
-    test.clock.advance(5ms);
-    return TurnQueue::Progress::kDone;
-  });
-  turns.add(ben_, [&] {
-    for (const ReporterID reporterID : all) reachedBefore += textsOf(1, reporterID).size();
-    return TurnQueue::Progress::kDone;
-  });
+  for (ReporterID reporterID = 1; reporterID <= static_cast<ReporterID>(kSessions); ++reporterID) {
+    start(*anna, reporterID);
+    all.push_back(reporterID);
+  }
   const auto sent = anna->request("sendMessage", messageTo(listOf(all)));
   const auto after = anna->request("reporterIDValid", {1});
+  std::vector<std::size_t> reached;  // how many sessions have the message, in Ben's turns
+  context->turns().add(ben_, [&] {
+    std::size_t count = 0;
+    for (const ReporterID reporterID : all) count += textsOf(1, reporterID).size();
+    reached.push_back(count);
+    return count < kSessions ? TurnQueue::Progress::kMore : TurnQueue::Progress::kDone;
+  });
   run();
-  EXPECT_EQ(reachedBefore, 0U);
-  for (const ReporterID reporterID : all) EXPECT_THAT(textsOf(1, reporterID), SizeIs(1)) << reporterID;
+  EXPECT_THAT(reached, SizeIs(testing::Gt(kSessions / 2)));
   const auto responses = anna->responses();
   ASSERT_GE(responses.size(), 2U);
   EXPECT_EQ(responses[responses.size() - 2].identifier, sent);
@@ -231,21 +253,42 @@ TEST_F(UserSeparationTest, ADisconnectionGivesBackWhatItsSessionsKept) {
 }
 
 TEST_F(UserSeparationTest, ALongDisconnectionLetsOthersHaveTheirTurns) {
-  for (ReporterID reporterID = 1; reporterID <= 5; ++reporterID) start(*anna, reporterID);
-  std::vector<std::size_t> started;
-  TurnQueue& turns = context->turns();
+  constexpr std::size_t kSessions = 10;
+  for (ReporterID reporterID = 1; reporterID <= static_cast<ReporterID>(kSessions); ++reporterID) {
+    start(*anna, reporterID);
+  }
   anna->disconnect();
-  turns.add(ben_, [&] {
-    std::size_t count = 0;
-    for (const auto& session : service->getAllActiveReportingSessions(*owner())) count += session->started();
-    started.push_back(count);
-    test.clock.advance(2ms);
-    return started.size() < 5 ? TurnQueue::Progress::kMore : TurnQueue::Progress::kDone;
+  std::vector<std::size_t> running;  // Anna's sessions, in Ben's turns
+  context->turns().add(ben_, [&] {
+    running.push_back(service->getAllActiveReportingSessions(*owner()).size());
+    return running.back() > 0 ? TurnQueue::Progress::kMore : TurnQueue::Progress::kDone;
   });
   run();
   EXPECT_EQ(service->getAllClients().size(), 2U);
-  ASSERT_EQ(started.size(), 5U);
-  EXPECT_THAT(started, testing::Each(testing::Lt(5U)));
+  EXPECT_THAT(running, SizeIs(testing::Gt(kSessions / 2)));
+}
+
+TEST_F(UserSeparationTest, ATrustedUsersOwnSessionComesFirst) {
+  start(*ben, 77);
+  start(*root, 77);
+  ask(*root, "sendMessage", messageTo(listOf({77}), "of root"));
+  EXPECT_THAT(textsOf(0, 77), IsEmpty());
+  EXPECT_THAT(textsOf(2, 77), ElementsAre("of root"));
+}
+
+TEST_F(UserSeparationTest, SessionsThatDoNotFitIntoTheUsersShareAreRefused) {
+  test.accounts.totals().setTotal(Resource::kKeptBytes, 4 * KeptBytesBudget::kLotBytes);
+  std::size_t created = 0;
+  for (ReporterID reporterID = 1; reporterID <= 20; ++reporterID) {
+    const auto answers = ask(*anna, "createReportingSession", {reporterID});
+    ASSERT_THAT(answers, SizeIs(1));
+    if (!answers[0].error) ++created;
+    if (answers[0].error) EXPECT_EQ(answers[0].error->code, kOverLimit);
+  }
+  EXPECT_EQ(created, 2 * KeptBytesBudget::kLotBytes / TWReportingSession::kOwnBytes);
+  create(*ben, 1);
+  ask(*anna, "destroyReportingSession", {1});
+  create(*anna, 21);
 }
 
 }  // namespace

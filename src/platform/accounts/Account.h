@@ -41,7 +41,7 @@ class ResourceTotals {
 // Any thread.
 class Account {
  public:
-  // `totals` and `allowance` are those of all accounts.
+  // `totals` are those of all accounts. `clock` outlives the account.
   Account(std::uint32_t user, std::shared_ptr<ResourceTotals> totals, const Clock& clock);
   Account(const Account&) = delete;
   Account& operator=(const Account&) = delete;
@@ -68,6 +68,10 @@ class Account {
   bool hasRoom(Resource resource) const {
     const std::uint64_t now = held(resource);
     return now == 0 || now < share(resource);
+  }
+
+  bool hasRoomFor(Resource resource, std::uint64_t amount) const {
+    return held(resource) + amount <= share(resource);
   }
 
   // Runs `callback` once, on the thread that gives, when the user has room after having had none. At once
@@ -103,6 +107,14 @@ class Charge {
   Charge(std::shared_ptr<Account> account, Resource resource, std::uint64_t amount)
       : account_(std::move(account)), resource_(resource), amount_(amount) {
     if (account_ != nullptr) account_->charge(resource_, amount_);
+  }
+  // Holds what has been taken.
+  static Charge ofTaken(std::shared_ptr<Account> account, Resource resource, std::uint64_t amount) {
+    Charge charge;
+    charge.account_ = std::move(account);
+    charge.resource_ = resource;
+    charge.amount_ = amount;
+    return charge;
   }
   Charge(Charge&& other) noexcept
       : account_(std::move(other.account_)),

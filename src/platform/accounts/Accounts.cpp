@@ -11,7 +11,7 @@ Accounts::Accounts(std::uint32_t owner, const Clock& clock) : owner_(owner), clo
 
 std::shared_ptr<Account> Accounts::of(std::uint32_t user) {
   const MutexLock lock(mutex_);
-  if (accounts_.size() >= kMaxAccounts && !accounts_.contains(user)) user = kNoUser;
+  if (accounts_.size() >= kMaxAccounts && !accounts_.contains(user) && !isTrusted(user)) user = kNoUser;
   std::shared_ptr<Account>& account = accounts_[user];
   if (account == nullptr) {
     account = std::make_shared<Account>(user, totals_, clock_);

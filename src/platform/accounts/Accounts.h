@@ -17,7 +17,8 @@ class Clock;
 // The accounts of all users: one for each user that has connected. Any thread.
 class Accounts {
  public:
-  // More users than this share the account of kNoUser, so that the list cannot grow without bound.
+  // Further users, unless they are trusted, get the account of kNoUser, so that the list cannot grow without
+  // bound. The front ends turn their clients away.
   static constexpr std::size_t kMaxAccounts = 1024;
 
   // `owner` is the user that the daemon runs as. `clock` outlives the accounts.

@@ -15,9 +15,7 @@ namespace tonewerk {
 inline std::optional<Charge> chargeWithinShare(const std::shared_ptr<Account>& account, Resource resource,
                                                std::uint64_t amount) {
   if (!account->take(resource, amount)) return std::nullopt;
-  std::optional<Charge> charge(std::in_place, account, resource, amount);
-  account->give(resource, amount);  // what take() took
-  return charge;
+  return Charge::ofTaken(account, resource, amount);
 }
 
 }  // namespace tonewerk

@@ -20,7 +20,7 @@ enum class Resource : std::uint8_t {
   kStoredBytes,
 };
 
-// Describes a resource. This table is the one place where the bounds are named; docs/users.md shows it.
+// Describes a resource. This table is the one place where the totals are named; docs/users.md shows it.
 struct ResourceFacts {
   Resource resource;
   // In answers to watch.accounts and in log lines.

@@ -22,7 +22,12 @@ void TurnQueue::add(const std::shared_ptr<Account>& account, Piece piece) {
   Lane& lane = lanes_[account.get()];
   if (lane.account == nullptr) lane.account = account;
   lane.pieces.push_back(std::move(piece));
-  if (lane.state == Lane::State::kIdle) setReady(lane);
+  if (lane.state != Lane::State::kIdle) return;
+  if (lane.deficit < std::chrono::nanoseconds::zero()) {  // the time without work has paid for it
+    const std::chrono::nanoseconds paid = clock_.monotonic() - lane.idleSince;
+    lane.deficit = std::min(std::chrono::nanoseconds::zero(), lane.deficit + paid);
+  }
+  setReady(lane);
 }
 
 void TurnQueue::setReady(Lane& lane) {
@@ -60,7 +65,6 @@ TurnQueue::Lane* TurnQueue::takeNext(std::vector<Lane*>& waiting) {
     if (!isEnding_ && !lane.hasWaitedLong && !lane.account->hasRoom(Resource::kSinkBytes)) {
       lane.state = Lane::State::kWaiting;
       ++waitingLanes_;
-      mayHaveWaiting_ = true;
       waiting.push_back(&lane);
       continue;
     }
@@ -72,6 +76,7 @@ TurnQueue::Lane* TurnQueue::takeNext(std::vector<Lane*>& waiting) {
     }
   }
   if (next != nullptr) next->state = Lane::State::kRunning;
+  mayHaveWaiting_ = waitingLanes_ > 0;
   othersWait_ = !ready_.empty();
   return next;
 }
@@ -93,7 +98,7 @@ void TurnQueue::runPieces(Lane& lane) {
     }
     const bool isDone = piece() == Progress::kDone;
     if (isDone) piece = nullptr;  // destroyed without the lock
-    isOver = isTurnOver() || isTimeOver();
+    isOver = !isDone || isTurnOver() || isTimeOver();
     const MutexLock lock(mutex_);
     if (!isDone) lane.pieces.push_front(std::move(piece));
     lane.pieces.insert(lane.pieces.begin(), std::make_move_iterator(continuations_.begin()),
@@ -103,11 +108,12 @@ void TurnQueue::runPieces(Lane& lane) {
   running_ = nullptr;
   runningLane_ = nullptr;
   const std::chrono::nanoseconds debt = -kLargestDebt;
-  const std::chrono::nanoseconds time = clock_.monotonic() - turnBegan_;
+  const std::chrono::nanoseconds now = clock_.monotonic();
   const MutexLock lock(mutex_);
   // A user saves no time for later.
-  lane.deficit = std::clamp(lane.deficit - time, debt, std::chrono::nanoseconds::zero());
+  lane.deficit = std::clamp(lane.deficit - (now - turnBegan_), debt, std::chrono::nanoseconds::zero());
   lane.state = Lane::State::kIdle;
+  lane.idleSince = now;
   if (!lane.pieces.empty()) setReady(lane);
 }
 
@@ -129,8 +135,8 @@ void TurnQueue::resume(Lane& lane, bool hasRoom) {
   if (lane.state != Lane::State::kWaiting) return;
   lane.hasWaitedLong = !hasRoom;
   lane.timer = nullptr;
-  mayHaveWaiting_ = --waitingLanes_ > 0;
-  setReady(lane);
+  --waitingLanes_;
+  setReady(lane);  // takeNext() clears mayHaveWaiting_: until then nothing may run before the lane's work
 }
 
 bool TurnQueue::continueFirst(Piece& piece) {
@@ -156,7 +162,7 @@ bool TurnQueue::hasPieces() const {
 }
 
 void TurnQueue::finish() {
-  endBegan_ = clock_.monotonic();
+  if (!isEnding_) endBegan_ = clock_.monotonic();
   isEnding_ = true;
   std::vector<Lane*> waiting;
   {

@@ -43,7 +43,7 @@ class TurnQueue : public std::enable_shared_from_this<TurnQueue> {
   static constexpr std::chrono::microseconds kTurn{1000};
   // What a user's turn took too long counts up to this time.
   static constexpr std::chrono::milliseconds kLargestDebt{50};
-  // A sink that has written nothing for so long does not hold a user's work any more.
+  // A user who has waited for so long goes on without room, until there is some again: the sink may hang.
   static constexpr std::chrono::milliseconds kLongestWait{2000};
   static constexpr std::chrono::milliseconds kLongestFinish{5000};
 
@@ -105,6 +105,7 @@ class TurnQueue : public std::enable_shared_from_this<TurnQueue> {
     std::shared_ptr<Account> account;
     std::deque<Piece> pieces;
     std::chrono::nanoseconds deficit{0};
+    std::chrono::nanoseconds idleSince{0};
     enum class State { kIdle, kReady, kRunning, kWaiting } state = State::kIdle;
     bool hasWaitedLong = false;  // its account's room does not count until there is some
     std::unique_ptr<Timer> timer;

@@ -13,6 +13,7 @@
 #include "platform/Heartbeat.h"
 #include "platform/Log.h"
 #include "platform/LogLines.h"
+#include "platform/accounts/WorkingFor.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingDefaults.h"
 #include "session/TWReportingSession.h"
@@ -111,6 +112,11 @@ std::shared_ptr<TWReportingSessionMemoryLogWorker> TWReportingSessionMemoryLogWo
 bool TWReportingSessionMemoryLogWorker::handleMessage(const TWReportingSessionMessage& message) {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   if (message.type != kTypeMemoryLog) return false;
+  // Everybody waits for the tools, so they are not for everybody.
+  if (const Account* user = WorkingFor::accountIfAny(); user != nullptr && !user->isTrusted()) {
+    errorLog(TWReportingSessionCategory(), "no memory log for user %u, who is not trusted", user->user());
+    return false;
+  }
   TWReportingContext& context = TWReportingContext::current();
   if (!context.singletons().get<MemoryLogLimiter>().claim(context.platform().clock)) return false;
   try {

@@ -10,6 +10,7 @@
 #include <vector>
 
 #include "platform/Heartbeat.h"
+#include "platform/accounts/WorkingFor.h"
 #include "support/ReportingTest.h"
 #include "workers/diagnostics/MemoryLogTool.h"
 
@@ -118,6 +119,20 @@ TEST_F(TWReportingSessionMemoryLogWorkerTest, MessagesOfOtherTypesDoNothingAndDo
   for (const int type : {0, 6, 18, 20, 65535}) EXPECT_FALSE(handle(static_cast<AudioEventType>(type)));
   EXPECT_THAT(commands(), IsEmpty());
   handle();
+  EXPECT_THAT(commands(), SizeIs(2));
+}
+
+TEST_F(TWReportingSessionMemoryLogWorkerTest,
+       AMessageOfAUserWhoIsNotTrustedLogsNothingAndDoesNotUseTheLimit) {
+  const auto user = test.accounts.of(1001);
+  {
+    const WorkingFor scope(user);
+    EXPECT_FALSE(handle());
+  }
+  EXPECT_THAT(commands(), IsEmpty());
+  EXPECT_THAT(errors(), ElementsAre(HasSubstr("no memory log for user 1001, who is not trusted")));
+  const WorkingFor scope(test.accounts.own());
+  EXPECT_FALSE(handle());
   EXPECT_THAT(commands(), SizeIs(2));
 }
 

@@ -8,6 +8,7 @@
 
 #include "platform/Log.h"
 #include "platform/accounts/Accounts.h"
+#include "platform/accounts/WorkingFor.h"
 #include "platform/linux/dbus/DbusAnswer.h"
 #include "platform/linux/messaging/AllocatorReclaimer.h"
 
@@ -23,6 +24,25 @@ std::size_t bytesHeldBy(const DbusArguments& read) {
   return bytes;
 }
 
+// A request that is under way: what it holds is charged to its user until its body has run.
+class ChargedRequest final : public InFlightCounter {
+ public:
+  ChargedRequest(InFlightToken token, Charge charge) : token_(std::move(token)), charge_(std::move(charge)) {}
+
+  void finished(std::size_t /*bytes*/) override {
+    token_ = {};
+    charge_ = {};
+  }
+
+ private:
+  InFlightToken token_;
+  Charge charge_;
+};
+
+ReplyError tooMuchUnderWay() {
+  return messagingError(kOverLimit, "too many requests of this client's user are under way");
+}
+
 }  // namespace
 
 DbusConnection::DbusConnection(const DbusConnectionContext& context, std::uint64_t identifier,
@@ -30,6 +50,8 @@ DbusConnection::DbusConnection(const DbusConnectionContext& context, std::uint64
     : context_(context),
       identifier_(identifier),
       name_(std::move(name)),
+      account_(context.accounts.of(kNoUser)),
+      waitingCharge_(account_, Resource::kUnfinishedBytes, 0),
       window_(std::make_shared<RequestWindow>(context.waker, identifier)),
       outbox_(std::make_shared<DbusOutbox>(context.waker, identifier)) {}
 
@@ -55,7 +77,9 @@ void DbusConnection::resume() {
 
 std::optional<ReplyError> DbusConnection::handleCall(sd_bus_message* call,
                                                      const DbusInterface::Entry& entry) {
-  if (isRejected_) return messagingError(kNotPermitted, "the service does not take this client");
+  const WorkingFor scope(account_);
+  if (rejection_) return rejection_;
+  if (!account_->hasRoom(Resource::kUnfinishedBytes)) return tooMuchUnderWay();
   if (!window_->hasRoom(outbox_->unsentBytes())) {
     return messagingError(kOverLimit, "too many requests of this client are under way");
   }
@@ -63,8 +87,10 @@ std::optional<ReplyError> DbusConnection::handleCall(sd_bus_message* call,
   DbusArguments read = readDbusArguments(call, entry, method, context_.texts);
   if (context_.memory != nullptr) context_.memory->clientSent(read.wireBytes);
   if (read.problem) return std::move(read.problem);
-  InFlightToken token = window_->start(bytesHeldBy(read) + method.replyBytes);
-  dispatch({entry.index, std::move(read.arguments), replyTo(call, method.result.type), std::move(token)});
+  const std::size_t bytes = bytesHeldBy(read) + method.replyBytes;
+  InFlightToken token = window_->start(bytes);
+  dispatch(
+      {entry.index, std::move(read.arguments), replyTo(call, method.result.type), std::move(token), bytes});
   return std::nullopt;
 }
 
@@ -78,9 +104,14 @@ Reply DbusConnection::replyTo(sd_bus_message* call, ResultType result) {
 
 void DbusConnection::dispatch(Request request) {
   if (!isAccepted_ || !isResumed_) {
+    waitingCharge_.setTo(waitingCharge_.amount() + request.bytes);
     waiting_.push_back(std::move(request));
     return;
   }
+  request.token = InFlightToken(
+      std::make_shared<ChargedRequest>(std::move(request.token),
+                                       Charge(account_, Resource::kUnfinishedBytes, request.bytes)),
+      0);
   const Method& method = context_.interface.methodAt(request.method);
   if (const auto problem = problemWithCaller(method, account_->isTrusted())) return request.reply(problem);
   // Kept alive here, because the request may end the connection.
@@ -91,14 +122,19 @@ void DbusConnection::dispatch(Request request) {
 
 void DbusConnection::dispatchWaiting() {
   if (!isAccepted_ || !isResumed_) return;
+  waitingCharge_.reduceTo(0);
   for (Request& request : std::exchange(waiting_, {})) dispatch(std::move(request));
 }
 
 void DbusConnection::identify(DbusPeer peer) {
   if (std::exchange(isIdentified_, true)) return;
   peer_ = peer;
-  infoLog(context_.log, "new %@", *this);
   account_ = context_.accounts.of(peer.userIdentifier);
+  const WorkingFor scope(account_);
+  infoLog(context_.log, "new %@", *this);
+  if (account_->user() != peer.userIdentifier) {
+    return reject(messagingError(kOverLimit, "the service has too many users"));
+  }
   hasPlace_ = account_->take(Resource::kBusConnections, 1);
   if (!hasPlace_) return reject(messagingError(kOverLimit, "the user has too many clients"));
   isAccepted_ = context_.delegate.listenerShouldAcceptNewConnection(*this) && object_ != nullptr;
@@ -106,10 +142,11 @@ void DbusConnection::identify(DbusPeer peer) {
   reject(messagingError(kNotPermitted, "the service does not take this client"));
 }
 
-void DbusConnection::reject(const ReplyError& error) {
+void DbusConnection::reject(ReplyError error) {
   infoLog(context_.log, "%@ was turned away", *this);
-  isRejected_ = true;
+  waitingCharge_.reduceTo(0);
   for (Request& request : std::exchange(waiting_, {})) request.reply(error);
+  rejection_ = std::move(error);
 }
 
 bool DbusConnection::sendNext(sd_bus* bus) {
@@ -131,6 +168,8 @@ bool DbusConnection::sendNext(sd_bus* bus) {
 
 void DbusConnection::end() {
   if (std::exchange(hasEnded_, true)) return;
+  const WorkingFor scope(account_);
+  waitingCharge_.reduceTo(0);
   outbox_->close();
   calls_.clear();
   waiting_.clear();

@@ -12,6 +12,7 @@
 
 #include "platform/Log.h"
 #include "platform/Messaging.h"
+#include "platform/accounts/Account.h"
 #include "platform/linux/dbus/DbusArguments.h"
 #include "platform/linux/dbus/DbusInterface.h"
 #include "platform/linux/dbus/DbusOutbox.h"
@@ -21,7 +22,6 @@
 
 namespace tonewerk {
 
-class Account;
 class Accounts;
 class AllocatorReclaimer;
 
@@ -62,7 +62,7 @@ class DbusConnection final : public MessagingConnection {
 
   std::int32_t processIdentifier() const override { return peer_.processIdentifier; }
   std::uint32_t userIdentifier() const override { return peer_.userIdentifier; }
-  // Null until identify().
+  // That of the unknown user until identify().
   const std::shared_ptr<Account>& account() const override { return account_; }
   std::string description() const override;
   void setRequestHandler(const RequestSet& interface, std::shared_ptr<RequestHandler> object) override;
@@ -94,12 +94,13 @@ class DbusConnection final : public MessagingConnection {
     Arguments arguments;
     Reply reply;
     InFlightToken token;
+    std::size_t bytes;  // that it holds
   };
 
   [[nodiscard]] Reply replyTo(sd_bus_message* call, ResultType result);
   void dispatch(Request request);
   void dispatchWaiting();
-  void reject(const ReplyError& error);
+  void reject(ReplyError error);
 
   const DbusConnectionContext& context_;
   const std::uint64_t identifier_;
@@ -112,12 +113,13 @@ class DbusConnection final : public MessagingConnection {
   std::function<void()> interrupted_;
   std::function<void()> invalidated_;
   bool isIdentified_ = false;
-  bool isRejected_ = false;
+  std::optional<ReplyError> rejection_;  // set when the client is not served
   bool isAccepted_ = false;
   bool isResumed_ = false;
   bool hasEnded_ = false;
 
   std::vector<Request> waiting_;  // until the connection is accepted and resumed
+  Charge waitingCharge_;          // for waiting_
   std::unordered_map<std::uint32_t, Call> calls_;
   std::uint32_t nextCall_ = 0;
   std::shared_ptr<RequestWindow> window_;

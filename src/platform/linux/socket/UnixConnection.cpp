@@ -36,6 +36,7 @@ UnixConnection::UnixConnection(const UnixConnectionContext& context, UserIntake&
       socket_(std::move(socket)),
       peer_(peer),
       readCharge_(intake.account, Resource::kReadBytes, 0),
+      replyCharge_(intake.account, Resource::kUnfinishedBytes, 0),
       window_(std::make_shared<RequestWindow>(context.waker, identifier)),
       outbox_(std::make_shared<ReplyOutbox>(socket_.get(), context.waker, identifier)) {}
 
@@ -71,6 +72,7 @@ void UnixConnection::handleEvents(std::uint32_t events) {
 void UnixConnection::handleWake() {
   if (hasEnded_) return;
   replies_ = outbox_->flush();
+  chargeReplies();
   if (isPaused_ && hasUsersRoom() && hasRoom()) process(std::exchange(unprocessed_, {}));
   updateInterest();
 }
@@ -120,6 +122,7 @@ void UnixConnection::process(SlabBytes received) {
     }
     if (isBegun) {
       requests->addFirst(frame, std::exchange(begun_, {}), method);
+      chargeRead();  // another connection's frame may go on
     } else {
       requests->add(frame, bytes.substr(0, frame.bytes), method);
     }
@@ -147,11 +150,19 @@ bool UnixConnection::hasUsersRoom() {
 }
 
 void UnixConnection::wakeWhenRoom(Resource resource) {
-  if (awaitsRoom_->exchange(true)) return;
-  intake_.account->whenRoom(resource, [waker = context_.waker, awaits = awaitsRoom_, number = identifier_] {
+  // Once more after a while: room that others make, or a larger total, wakes nobody.
+  context_.waiting.push_back(identifier_);
+  const auto& awaits = resource == Resource::kReadBytes ? awaitsReadRoom_ : awaitsRequestRoom_;
+  if (awaits->exchange(true)) return;
+  intake_.account->whenRoom(resource, [waker = context_.waker, awaits, number = identifier_] {
     *awaits = false;
     waker->wake(number);
   });
+}
+
+void UnixConnection::chargeReplies() {
+  const std::size_t unsent = outbox_->unsentBytes();
+  if (unsent != replyCharge_.amount()) replyCharge_.setTo(unsent);
 }
 
 // Bytes that wait hold their slab.
@@ -234,6 +245,7 @@ void UnixConnection::end() {
   begun_ = {};
   unprocessed_ = {};
   chargeRead();
+  replyCharge_.setTo(0);
   outbox_->close();
   if (interest_ != 0) context_.epoll.remove(socket_.get());
   infoLog(context_.log, "%@ has ended", *this);

@@ -9,6 +9,7 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "platform/Log.h"
 #include "platform/Messaging.h"
@@ -34,6 +35,8 @@ struct UnixConnectionContext {
   const LogCategory& log;
   // Learns how many bytes a client has sent, and when it is gone. May be null.
   AllocatorReclaimer* memory;
+  // Connections that are to be woken after a while, because their users had no room.
+  std::vector<std::uint64_t>& waiting;
 };
 
 // The process at the other end of a socket, as the kernel reports it.
@@ -95,6 +98,7 @@ class UnixConnection final : public MessagingConnection {
   void wakeWhenRoom(Resource resource);
   // Charges the user for the frame that has begun and for bytes that wait.
   void chargeRead();
+  void chargeReplies();
 
   const UnixConnectionContext& context_;
   UserIntake& intake_;
@@ -113,7 +117,9 @@ class UnixConnection final : public MessagingConnection {
   std::string begun_;  // the bytes so far of a frame that did not arrive in one read
   Charge readCharge_;  // for begun_ and unprocessed_
   // Set while the connection is to be woken when its user has room.
-  const std::shared_ptr<std::atomic<bool>> awaitsRoom_ = std::make_shared<std::atomic<bool>>(false);
+  const std::shared_ptr<std::atomic<bool>> awaitsReadRoom_ = std::make_shared<std::atomic<bool>>(false);
+  const std::shared_ptr<std::atomic<bool>> awaitsRequestRoom_ = std::make_shared<std::atomic<bool>>(false);
+  Charge replyCharge_;  // for answers that the peer does not read
   std::shared_ptr<RequestWindow> window_;
   bool isPaused_ = false;
   SlabBytes unprocessed_;

@@ -41,7 +41,7 @@ UnixSocketListener::UnixSocketListener(std::unique_ptr<ServerSocket> socket, con
     : socket_(std::move(socket)),
       log_(log),
       accounts_(accounts),
-      context_{epoll_, waker_, std::make_shared<RpcFrameDecoder>(), log_, memory},
+      context_{epoll_, waker_, std::make_shared<RpcFrameDecoder>(), log_, memory, waiting_},
       watchdog_(std::move(watchdog)),
       maxConnections_(descriptorsForClients()) {
   accounts_.totals().setTotal(Resource::kConnections, maxConnections_);
@@ -77,7 +77,9 @@ void UnixSocketListener::run() {
     const BatchScope round;
     const auto timeout = ready_.empty() ? timeToNextRound() : std::chrono::milliseconds::zero();
     for (const Epoll::Event& event : epoll_.wait(timeout)) handle(event);
+    if (wakeWaitingAt_ && std::chrono::steady_clock::now() >= *wakeWaitingAt_) wakeWaiting();
     serveQueued();
+    if (!waiting_.empty() && !wakeWaitingAt_) wakeWaitingAt_ = std::chrono::steady_clock::now() + kRoomPause;
     if (acceptAgainAt_ && std::chrono::steady_clock::now() >= *acceptAgainAt_) resumeAccepting();
     if (watchdog_ != nullptr) watchdog_->pingIfDue();
   }
@@ -122,6 +124,11 @@ void UnixSocketListener::serveQueued() {
   }
 }
 
+void UnixSocketListener::wakeWaiting() {
+  wakeWaitingAt_.reset();
+  for (const std::uint64_t identifier : std::exchange(waiting_, {})) queue(identifier, 0, true);
+}
+
 void UnixSocketListener::serve(std::uint64_t identifier) {
   const auto found = connections_.find(identifier);
   if (found == connections_.end()) return;
@@ -129,7 +136,8 @@ void UnixSocketListener::serve(std::uint64_t identifier) {
   entry.isQueued = false;
   const std::uint32_t events = std::exchange(entry.events, 0);
   const bool isWoken = std::exchange(entry.isWoken, false);
-  const WorkingFor scope(entry.intake->account);
+  const std::shared_ptr<Account> account = entry.intake->account;  // the intake may go with the connection
+  const WorkingFor scope(account);
   if (events != 0) {
     entry.connection->handleEvents(events);
   } else if (isWoken) {
@@ -182,6 +190,10 @@ void UnixSocketListener::add(FileDescriptor socket) {
   const UnixPeer peer = UnixPeer::of(socket);
   const std::shared_ptr<Account> account = accounts_.of(peer.user);
   const WorkingFor scope(account);
+  if (account->user() != peer.user) {
+    errorLog(log_, "too many users: process %i of user %u is turned away", peer.process, peer.user);
+    return;
+  }
   if (!account->take(Resource::kConnections, 1)) {
     errorLog(log_, "user %u has %lu connections and gets no more: process %i is turned away", peer.user,
              account->held(Resource::kConnections), peer.process);
@@ -230,17 +242,18 @@ void UnixSocketListener::watchSocket() {
   pauseAccepting(std::generic_category().message(errno));
 }
 
-std::optional<std::chrono::milliseconds> UnixSocketListener::timeToNextAccept() const {
-  if (!acceptAgainAt_) return std::nullopt;
-  const auto left =
-      std::chrono::ceil<std::chrono::milliseconds>(*acceptAgainAt_ - std::chrono::steady_clock::now());
-  return std::max(left, std::chrono::milliseconds::zero());
-}
-
 std::optional<std::chrono::milliseconds> UnixSocketListener::timeToNextRound() const {
-  const auto accept = timeToNextAccept();
-  if (watchdog_ == nullptr) return accept;
-  return accept ? std::min(*accept, watchdog_->timeToNext()) : watchdog_->timeToNext();
+  std::optional<std::chrono::milliseconds> next;
+  const auto consider = [&next](std::chrono::milliseconds time) {
+    next = next ? std::min(*next, time) : time;
+  };
+  for (const auto& due : {acceptAgainAt_, wakeWaitingAt_}) {
+    if (!due) continue;
+    const auto left = std::chrono::ceil<std::chrono::milliseconds>(*due - std::chrono::steady_clock::now());
+    consider(std::max(left, std::chrono::milliseconds::zero()));
+  }
+  if (watchdog_ != nullptr) consider(watchdog_->timeToNext());
+  return next;
 }
 
 void UnixSocketListener::remove(std::uint64_t identifier) {

@@ -10,6 +10,7 @@
 #include <optional>
 #include <thread>
 #include <unordered_map>
+#include <vector>
 
 #include "platform/Messaging.h"
 #include "platform/linux/descriptors/Epoll.h"
@@ -37,6 +38,8 @@ class UnixSocketListener final : public MessagingListener {
   // When the system has no descriptor for another client, the listener tries again after this time or when a
   // connection has ended.
   static constexpr std::chrono::milliseconds kAcceptPause{1000};
+  // After this time connections whose users had no room look again.
+  static constexpr std::chrono::milliseconds kRoomPause{1000};
 
   // `log`, `accounts` and `memory` outlive the listener. The messaging thread feeds `watchdog`; without one
   // it wakes up only for clients. `memory` learns how many bytes clients send and when a client is gone. It
@@ -75,6 +78,8 @@ class UnixSocketListener final : public MessagingListener {
   // Serves connections that are queued, for about kRound.
   void serveQueued();
   void serve(std::uint64_t identifier);
+  // Has the connections that wait for their users' room look again.
+  void wakeWaiting();
   void accept();
   void recreateSocket();
   void add(FileDescriptor socket);
@@ -84,7 +89,6 @@ class UnixSocketListener final : public MessagingListener {
   void resumeAccepting();
   // Adds the listening socket to the epoll. If that fails it pauses accepting, and so tries again later.
   void watchSocket();
-  std::optional<std::chrono::milliseconds> timeToNextAccept() const;
   std::optional<std::chrono::milliseconds> timeToNextRound() const;
   // Removes a connection that has ended.
   void remove(std::uint64_t identifier);
@@ -98,6 +102,8 @@ class UnixSocketListener final : public MessagingListener {
   Epoll epoll_;
   const std::shared_ptr<IoWaker> waker_ = std::make_shared<IoWaker>();
   Accounts& accounts_;
+  std::vector<std::uint64_t> waiting_;  // connections whose users had no room
+  std::optional<std::chrono::steady_clock::time_point> wakeWaitingAt_;
   const UnixConnectionContext context_;
   // Of the users that have connections.
   std::unordered_map<const Account*, std::unique_ptr<UserIntake>> intakes_;

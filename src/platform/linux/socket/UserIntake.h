@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <algorithm>
 #include <cstddef>
 #include <cstdint>
 #include <deque>
@@ -33,7 +34,10 @@ class UserIntake {
     if (account->hasRoom(Resource::kReadBytes)) return true;
     if (frameHolder_ == kNobody) frameHolder_ = connection;
     if (frameHolder_ == connection) return true;
-    waitingForFrames_.push_back(connection);
+    if (std::find(waitingForFrames_.begin(), waitingForFrames_.end(), connection) ==
+        waitingForFrames_.end()) {
+      waitingForFrames_.push_back(connection);
+    }
     return false;
   }
   // The connection has no frame that it has begun, any more. Returns the connections that may try again.

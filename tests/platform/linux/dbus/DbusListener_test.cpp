@@ -490,7 +490,7 @@ TEST_F(DbusListenerTest, RefusesRequestsWhoseBytesWouldPassTheBound) {
 }
 
 TEST_F(DbusListenerTest, RefusesAClientBeyondItsUsersShareUntilAnotherHasGone) {
-  constexpr std::size_t kShare = DbusService::kMaxClients / 2;
+  const std::size_t kShare = accounts->totals().total(Resource::kBusConnections) / 2;
   std::vector<std::unique_ptr<DbusCaller>> callers;
   for (std::size_t at = 0; at < kShare; ++at) {
     callers.push_back(std::make_unique<DbusCaller>(bus.address(), kNames));
@@ -511,12 +511,13 @@ TEST_F(DbusListenerTest, RefusesAClientBeyondItsUsersShareUntilAnotherHasGone) {
 TEST_F(DbusListenerTest, RefusesAClientBeyondTheBoundOfAllUsers) {
   // Other users hold all places but one.
   const auto other = accounts->of(::geteuid() + 1);
-  other->charge(Resource::kBusConnections, DbusService::kMaxClients - 1);
+  const std::uint64_t most = accounts->totals().total(Resource::kBusConnections) - 1;
+  other->charge(Resource::kBusConnections, most);
   DbusCaller first(bus.address(), kNames);
   EXPECT_TRUE(isServed(first));
   DbusCaller second(bus.address(), kNames);
   EXPECT_EQ(second.ask("TakeInt64", "x", std::int64_t{1}).error, SD_BUS_ERROR_LIMITS_EXCEEDED);
-  other->give(Resource::kBusConnections, DbusService::kMaxClients - 1);
+  other->give(Resource::kBusConnections, most);
   EXPECT_TRUE(isServed(second));
 }
 
