@@ -26,7 +26,7 @@ check 'nor post it with its state' refuses post_as neighbour com.example.players
 check 'it has the state of its owner' posted com.example.players 2
 check 'the other member posts other names' post_as neighbour com.example.neighbours 3
 
-check 'the daemon\'s user posts its own' post_as tonewerk com.example.daemons 4
+check "the daemon's user posts its own" post_as tonewerk com.example.daemons 4
 check 'and posts it again' post_as tonewerk com.example.daemons
 check 'with the state that it had' posted com.example.daemons 4
 check 'and changes it' post_as tonewerk com.example.daemons 5
