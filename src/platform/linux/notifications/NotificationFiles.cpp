@@ -39,6 +39,12 @@ FileDescriptor openRegularFile(const std::string& path, int flags, std::error_co
   return {};
 }
 
+// Looks at a link itself. False when there is nothing at the path.
+bool belongsToAnother(const std::string& path) {
+  struct stat status {};
+  return lstat(path.c_str(), &status) == 0 && status.st_uid != geteuid();
+}
+
 std::optional<std::uint64_t> parseState(std::string_view text) {
   constexpr std::string_view kSpaces = " \t\r\n";
   text.remove_prefix(std::min(text.find_first_not_of(kSpaces), text.size()));
@@ -125,18 +131,19 @@ std::error_code NotificationFiles::post(std::string_view name) const {
   // Closing a file that was opened for writing is a post. It keeps a state that another writer sets
   // meanwhile.
   if (openRegularFile(path, O_WRONLY, error)) return {};
-  if (error == std::errc::permission_denied) return takeOver(name);
+  if (error == std::errc::permission_denied || belongsToAnother(path)) return takeOver(name);
   if (error != std::errc::no_such_file_or_directory) return error;
   error = put(0, [&](const char* made) { return link(made, path.c_str()); });
   // Another process created the file meanwhile. That was a post of the same name.
   return error == std::errc::file_exists ? std::error_code() : error;
 }
 
-// A state that another writer sets meanwhile is lost, as if it had been set before.
+// A state that another writer sets meanwhile is lost, as if it had been set before. The other user may have left a
+// file without rights for us, a pipe or a link, which must not keep the name from the directory's owner. So only the
+// directory's rights decide, when the file is replaced.
 std::error_code NotificationFiles::takeOver(std::string_view name) const {
   std::error_code error;
   const std::optional<std::uint64_t> kept = state(name, error);
-  if (error == std::errc::permission_denied) return error;
   error = post(name, kept.value_or(0));
   return error == std::errc::operation_not_permitted ? std::make_error_code(std::errc::permission_denied)
                                                      : error;

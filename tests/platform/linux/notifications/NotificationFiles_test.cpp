@@ -2,6 +2,7 @@
 #include "platform/linux/notifications/NotificationFiles.h"
 
 #include <cstdint>
+#include <fcntl.h>
 #include <filesystem>
 #include <fstream>
 #include <gmock/gmock.h>
@@ -10,6 +11,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include "platform/linux/descriptors/FileDescriptor.h"
 #include "support/OtherUser.h"
 #include "support/TemporaryDirectory.h"
 
@@ -168,13 +170,25 @@ class SharedNotificationFilesTest : public NotificationFilesTest {
   }
   uid_t ownerOf(const std::string& name) const {
     struct stat status {};
-    EXPECT_EQ(stat((files.directory() + "/" + name).c_str(), &status), 0);
+    EXPECT_EQ(lstat((files.directory() + "/" + name).c_str(), &status), 0);
     return status.st_uid;
   }
   void writeAs(uid_t owner, const std::string& name, const std::string& text) {
     write(name, text);
     ASSERT_EQ(chown((files.directory() + "/" + name).c_str(), owner, owner), 0);
     ASSERT_EQ(chmod((files.directory() + "/" + name).c_str(), 0644), 0);
+  }
+  // Makes a file that nobody can read as a state: a closed one, a pipe, or a link to a state outside.
+  void writeUnreadableAs(uid_t owner) {
+    writeAs(owner, "closed", "5\n");
+    ASSERT_EQ(chmod((files.directory() + "/closed").c_str(), 0600), 0);
+    ASSERT_EQ(mkfifo((files.directory() + "/pipe").c_str(), 0600), 0);
+    ASSERT_EQ(chmod((files.directory() + "/pipe").c_str(), 0666), 0);
+    std::ofstream(directory.path("outside")) << "41\n";
+    std::filesystem::create_symlink(directory.path("outside"), files.directory() + "/link");
+    for (const char* name : {"pipe", "link"}) {
+      ASSERT_EQ(lchown((files.directory() + "/" + name).c_str(), owner, owner), 0);
+    }
   }
 
   static constexpr uid_t kThirdUser = kOtherUser - 1;
@@ -204,6 +218,38 @@ TEST_F(SharedNotificationFilesTest, NobodyElsePostsTheNameOfAnotherUser) {
   EXPECT_EQ(state("a"), 5U);
   EXPECT_EQ(state("b"), 2U);
   EXPECT_THAT(names(), UnorderedElementsAre("a", "b"));
+}
+
+TEST_F(SharedNotificationFilesTest, TheDirectorysOwnerPostsTheNameOfAFileThatItCannotRead) {
+  share(kOtherUser);
+  writeUnreadableAs(kThirdUser);
+  for (const char* name : {"closed", "pipe", "link"}) {
+    runAsOtherUser([&] { EXPECT_FALSE(files.post(name)) << name; });
+    EXPECT_EQ(ownerOf(name), kOtherUser) << name;
+    EXPECT_EQ(state(name), 0U) << name;
+  }
+  std::string outside;
+  std::getline(std::ifstream(directory.path("outside")), outside);
+  EXPECT_EQ(outside, "41");
+}
+
+TEST_F(SharedNotificationFilesTest, APipeThatAnotherUserReadsDoesNotKeepItsName) {
+  share(kOtherUser);
+  writeUnreadableAs(kThirdUser);
+  const FileDescriptor reader(open((files.directory() + "/pipe").c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC));
+  ASSERT_TRUE(reader);
+  runAsOtherUser([&] { EXPECT_FALSE(files.post("pipe")); });
+  EXPECT_EQ(state("pipe"), 0U);
+}
+
+TEST_F(SharedNotificationFilesTest, NobodyElsePostsTheNameOfAFileThatCannotBeRead) {
+  share(kThirdUser);
+  writeUnreadableAs(kThirdUser);
+  for (const char* name : {"closed", "pipe", "link"}) {
+    runAsOtherUser([&] { EXPECT_EQ(files.post(name), std::errc::permission_denied) << name; });
+    EXPECT_EQ(ownerOf(name), kThirdUser) << name;
+  }
+  EXPECT_THAT(names(), UnorderedElementsAre("closed", "pipe", "link"));
 }
 
 }  // namespace
