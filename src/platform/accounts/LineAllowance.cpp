@@ -9,28 +9,30 @@
 namespace tonewerk {
 
 LineAllowance::LineAllowance(const Clock& clock, Rate rate, LineAllowance* all)
-    : clock_(clock), rate_(rate), all_(all), left_(rate.burst), filledAt_(clock.monotonic()) {}
+    : clock_(clock), rate_(rate), all_(all), left_(rate.burst), filledAt_(clock.coarseMonotonic()) {}
 
-bool LineAllowance::hasLine() {
-  if (left_ < 1) {
-    const std::chrono::nanoseconds now = clock_.monotonic();
-    const double seconds = std::chrono::duration<double>(now - std::exchange(filledAt_, now)).count();
-    left_ = std::min<double>(rate_.burst, left_ + seconds * rate_.perSecond);
-  }
-  return left_ >= 1;
+void LineAllowance::refill() {
+  const std::chrono::nanoseconds now = clock_.coarseMonotonic();
+  if (now <= filledAt_) return;
+  const double seconds = std::chrono::duration<double>(now - std::exchange(filledAt_, now)).count();
+  left_ = std::min<double>(rate_.burst, left_ + seconds * rate_.perSecond);
 }
 
-std::optional<std::uint64_t> LineAllowance::takeLine() {
+bool LineAllowance::takeLine() {
   const MutexLock lock(mutex_);
-  const bool isMine = hasLine();
-  const std::optional<std::uint64_t> others = isMine && all_ != nullptr ? all_->takeLine() : std::nullopt;
-  if (!isMine || (all_ != nullptr && !others)) {
-    ++heldBack_;
-    ++unsaid_;
-    return std::nullopt;
+  refill();
+  if (left_ >= 1 && (all_ == nullptr || all_->takeLine())) {
+    left_ -= 1;
+    return true;
   }
-  left_ -= 1;
-  return std::exchange(unsaid_, 0);
+  if (left_ < 1 && all_ != nullptr) all_->countHeldBack();
+  ++heldBack_;
+  return false;
+}
+
+void LineAllowance::countHeldBack() {
+  const MutexLock lock(mutex_);
+  ++heldBack_;
 }
 
 std::uint64_t LineAllowance::heldBack() const {

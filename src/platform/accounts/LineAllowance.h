@@ -3,7 +3,6 @@
 
 #include <chrono>
 #include <cstdint>
-#include <optional>
 
 #include "values/Mutex.h"
 
@@ -12,7 +11,7 @@ namespace tonewerk {
 class Clock;
 
 // Limits how many log lines somebody may cause: a number at once, and then a number each second. Counts those
-// that are held back. Any thread.
+// that are held back; who writes the lines says so in the log (platform/linux/log/FairLog.h). Any thread.
 class LineAllowance {
  public:
   struct Rate {
@@ -20,18 +19,19 @@ class LineAllowance {
     std::uint32_t perSecond;
   };
 
-  // Lines count against `all`, too, unless that is null. `clock` and `all` outlive the object.
+  // Lines count against `all`, too, unless that is null, and so do those that are held back. `clock` and `all`
+  // outlive the object.
   LineAllowance(const Clock& clock, Rate rate, LineAllowance* all = nullptr);
 
-  // Asks to write one line. None when it is to be held back. Else how many lines were held back since the
-  // last one that was written; the caller says so when there were any.
-  [[nodiscard]] std::optional<std::uint64_t> takeLine();
+  // Asks to write one line. False, and the line is counted, when it is to be held back.
+  [[nodiscard]] bool takeLine();
 
   // How many lines were held back in all.
   std::uint64_t heldBack() const;
 
  private:
-  bool hasLine() REQUIRES(mutex_);
+  void refill() REQUIRES(mutex_);
+  void countHeldBack();
 
   const Clock& clock_;
   const Rate rate_;
@@ -40,7 +40,6 @@ class LineAllowance {
   double left_ GUARDED_BY(mutex_);
   std::chrono::nanoseconds filledAt_ GUARDED_BY(mutex_);
   std::uint64_t heldBack_ GUARDED_BY(mutex_) = 0;
-  std::uint64_t unsaid_ GUARDED_BY(mutex_) = 0;
 };
 
 }  // namespace tonewerk

@@ -18,6 +18,13 @@ namespace {
 constexpr Resource kKept = Resource::kKeptBytes;
 constexpr std::uint32_t kOwner = 990;
 
+// Of so many lines, those that may be written.
+int linesOf(LineAllowance& lines, int count) {
+  int written = 0;
+  for (int line = 0; line < count; ++line) written += lines.takeLine() ? 1 : 0;
+  return written;
+}
+
 class AccountTest : public testing::Test {
  protected:
   AccountTest() { accounts.totals().setTotal(kKept, 1000); }
@@ -170,27 +177,47 @@ TEST_F(AccountTest, TheInnermostScopeSaysForWhomAThreadWorks) {
 
 TEST_F(AccountTest, LinesBeyondTheAllowanceAreHeldBackAndCounted) {
   LineAllowance lines(clock, {.burst = 3, .perSecond = 2});
-  for (int line = 0; line < 3; ++line) EXPECT_EQ(lines.takeLine(), 0U);
-  EXPECT_EQ(lines.takeLine(), std::nullopt);
-  EXPECT_EQ(lines.takeLine(), std::nullopt);
+  EXPECT_EQ(linesOf(lines, 5), 3);
   clock.advance(0.5);
-  EXPECT_EQ(lines.takeLine(), 2U);
-  EXPECT_EQ(lines.takeLine(), std::nullopt);
+  EXPECT_EQ(linesOf(lines, 2), 1);
   EXPECT_EQ(lines.heldBack(), 3U);
   clock.advance(1000);
-  for (int line = 0; line < 3; ++line) EXPECT_NE(lines.takeLine(), std::nullopt);
-  EXPECT_EQ(lines.takeLine(), std::nullopt);
+  EXPECT_EQ(linesOf(lines, 4), 3);
+}
+
+TEST_F(AccountTest, AQuietTimeGivesNoMoreLinesAtOnceThanTheBurst) {
+  LineAllowance lines(clock, {.burst = 3, .perSecond = 2});
+  clock.advance(1000);
+  EXPECT_EQ(linesOf(lines, 10), 3);
+  clock.advance(1);
+  EXPECT_EQ(linesOf(lines, 10), 2);
+}
+
+TEST_F(AccountTest, LinesThatComeOftenAreGivenTheirRate) {
+  LineAllowance lines(clock, {.burst = 1, .perSecond = 2});
+  int written = 0;
+  for (int tenth = 0; tenth < 100; ++tenth, clock.advance(0.125)) written += linesOf(lines, 1);
+  EXPECT_EQ(written, 25);
 }
 
 TEST_F(AccountTest, AClientsLinesCountForItsUser) {
   LineAllowance user(clock, {.burst = 3, .perSecond = 1});
   LineAllowance one(clock, {.burst = 2, .perSecond = 1}, &user);
   LineAllowance other(clock, {.burst = 2, .perSecond = 1}, &user);
-  EXPECT_EQ(one.takeLine(), 0U);
-  EXPECT_EQ(one.takeLine(), 0U);
-  EXPECT_EQ(one.takeLine(), std::nullopt);
-  EXPECT_EQ(other.takeLine(), 0U);
-  EXPECT_EQ(other.takeLine(), std::nullopt);
+  EXPECT_EQ(linesOf(one, 3), 2);
+  EXPECT_EQ(linesOf(other, 2), 1);
+}
+
+TEST_F(AccountTest, ALineThatIsHeldBackCountsOnceForItsClientAndOnceForItsUser) {
+  LineAllowance user(clock, {.burst = 3, .perSecond = 1});
+  LineAllowance one(clock, {.burst = 2, .perSecond = 1}, &user);
+  LineAllowance other(clock, {.burst = 2, .perSecond = 1}, &user);
+  EXPECT_EQ(linesOf(one, 6), 2);
+  EXPECT_EQ(one.heldBack(), 4U);
+  EXPECT_EQ(user.heldBack(), 4U);
+  EXPECT_EQ(linesOf(other, 2), 1);
+  EXPECT_EQ(other.heldBack(), 1U);
+  EXPECT_EQ(user.heldBack(), 5U);
 }
 
 }  // namespace
