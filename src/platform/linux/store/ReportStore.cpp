@@ -35,7 +35,7 @@ ReportStore::ReportStore(const std::string& directory, const JsonService& json,
       accounts_(accounts),
       log_(log),
       queue_(limits),
-      database_(directory, json),
+      database_(directory, json, clock),
       thread_([this] { run(); }) {
   accounts.totals().setTotal(Resource::kSinkBytes, limits.bytes);
 }

@@ -4,6 +4,7 @@
 #include <chrono>
 #include <cstdint>
 #include <filesystem>
+#include <sys/stat.h>
 #include <system_error>
 #include <utility>
 
@@ -17,22 +18,27 @@ constexpr std::chrono::milliseconds kPatience{500};
 
 }  // namespace
 
-StoreDatabase::StoreDatabase(std::string directory, const JsonService& json)
-    : directory_(std::move(directory)), path_(directory_ + "/" + std::string(kStoreFileName)), json_(json) {}
+StoreDatabase::StoreDatabase(std::string directory, const JsonService& json, const Clock& clock)
+    : directory_(std::move(directory)),
+      path_(directory_ + "/" + std::string(kStoreFileName)),
+      json_(json),
+      clock_(clock) {}
 
 StoreDatabase::Result StoreDatabase::write(const StoreBatch& batch) {
   if (database_.isOpen() && database_.hasMoved()) close();
   const Result opened = open();
   if (opened != Result::kDone || batch.empty()) return opened;
+  holdings_.begin();
   if (!begin_.run() || !insert(batch) || !commit_.run()) return fail();
+  holdings_.commit();
   rtc_->committed();
   return Result::kDone;
 }
 
 bool StoreDatabase::insert(const StoreBatch& batch) {
-  if (!holdings_->add(batch) || !rtc_->insertSessions(batch)) return false;
+  if (!holdings_.add(batch) || !rtc_->insertSessions(batch)) return false;
   for (const RtcTable::NewSession& session : rtc_->newSessions()) {
-    holdings_->addRow(session.user, session.bytes);
+    holdings_.addRow(session.user, session.bytes);
   }
   return numbering_->number(batch) && analytics_->insert(batch, *numbering_) && metrics_->insert(batch) &&
          power_->insert(batch) && rtc_->insertMessages(batch, numbering_->rtcMessages());
@@ -50,12 +56,13 @@ StoreDatabase::Result StoreDatabase::trimAge(double now, bool& moreToDo) {
 
 StoreDatabase::Result StoreDatabase::trimSize(bool& moreToDo) {
   if (!database_.isOpen()) return Result::kDone;
-  if (!holdings_->read()) return fail();
+  if (!holdings_.read()) return fail();
   return resultOf(trimmer_->trimSize(bounds_), moreToDo);
 }
 
 bool StoreDatabase::moveAside() {
   close();
+  holdings_.forget();
   // The write-ahead log is renamed first: a new database must not find it, or its pages would overwrite the
   // new ones.
   for (const char* suffix : {"-wal", "-shm", ""}) {
@@ -98,13 +105,22 @@ StoreDatabase::Result StoreDatabase::open() {
   metrics_.emplace(database_);
   power_.emplace(database_);
   rtc_.emplace(database_, json_, fileNumber_);
-  holdings_.emplace(database_);
-  trimmer_.emplace(database_, *holdings_);
+  trimmer_.emplace(database_, holdings_, clock_);
+  recognizeFile();
   return Result::kDone;
+}
+
+void StoreDatabase::recognizeFile() {
+  struct stat status {};
+  const bool isKnown = ::stat(path_.c_str(), &status) == 0;
+  if (!isKnown || status.st_dev != device_ || status.st_ino != inode_) holdings_.forget();
+  device_ = status.st_dev;
+  inode_ = status.st_ino;
 }
 
 bool StoreDatabase::prepareFile() {
   ++fileNumber_;
+  holdings_.forget();  // it may have the number of a file that was removed
   // These settings come before anything else is in the file; later they would take effect only when the whole
   // file is rewritten. Pages of 8 KiB are cheaper to fill than smaller ones, and a commit of a single message
   // still writes one page only.
@@ -138,6 +154,7 @@ StoreDatabase::Result StoreDatabase::resultOf(StoreTrimmer::Outcome outcome, boo
 StoreDatabase::Result StoreDatabase::fail() {
   const Result result = database_.isCorrupt() ? Result::kCorrupt : Result::kFailed;
   closeWith(database_.problem());
+  if (result == Result::kCorrupt) holdings_.forget();
   return result;
 }
 
@@ -161,8 +178,8 @@ void StoreDatabase::close() {
   power_.reset();
   rtc_.reset();
   trimmer_.reset();
-  holdings_.reset();
   database_.close();
+  holdings_.undo();
 }
 
 }  // namespace tonewerk

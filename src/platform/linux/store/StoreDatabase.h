@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <optional>
 #include <string>
+#include <sys/types.h>
 
 #include "platform/linux/store/AnalyticsTable.h"
 #include "platform/linux/store/MetricTable.h"
@@ -17,10 +18,13 @@
 
 namespace tonewerk {
 
+class Clock;
+
 // The report store's file. Used on the writer's thread.
 //
 // It is opened by the first write, and again after every failure. So the next try uses a disk that works
-// again, a directory that was made, or a file that was put in place by hand.
+// again, a directory that was made, or a file that was put in place by hand. What each user holds stays known
+// as long as it is the same file, because reading all rows for each try that fails would take very long.
 class StoreDatabase {
  public:
   enum class Result {
@@ -29,8 +33,8 @@ class StoreDatabase {
     kCorrupt,  // the file is damaged or is no database
   };
 
-  // The file is in `directory`, which is made when it is missing.
-  StoreDatabase(std::string directory, const JsonService& json);
+  // The file is in `directory`, which is made when it is missing. `json` and `clock` outlive it.
+  StoreDatabase(std::string directory, const JsonService& json, const Clock& clock);
 
   // Writes all rows or none of them. The operating system then has the rows; a power cut may lose the last
   // ones.
@@ -41,9 +45,9 @@ class StoreDatabase {
   // Sets `moreToDo` when another slice is needed. Does nothing while the file is closed.
   [[nodiscard]] Result trimAge(double now, bool& moreToDo);
   [[nodiscard]] Result trimSize(bool& moreToDo);
-  // What the rows of a user count (StoreHolding). 0 while the file is closed, and before the first
-  // trimSize(), which reads the rows that were there.
-  std::int64_t bytesOf(std::uint32_t user) const { return holdings_ ? holdings_->of(user) : 0; }
+  // What the rows of a user count (StoreHolding). 0 before the first trimSize(), which reads the rows that
+  // were there.
+  std::int64_t bytesOf(std::uint32_t user) const { return holdings_.of(user); }
   // Renames the file and its side files to "<path>.corrupt...", and replaces those of an earlier time. On
   // failure it is false, and problem() describes it.
   [[nodiscard]] bool moveAside();
@@ -59,6 +63,8 @@ class StoreDatabase {
   [[nodiscard]] bool addUserColumns();
   [[nodiscard]] bool insert(const StoreBatch& batch);
   void applyBounds();
+  // Forgets what users hold when the path has another file than before.
+  void recognizeFile();
   [[nodiscard]] Result resultOf(StoreTrimmer::Outcome outcome, bool& moreToDo);
   [[nodiscard]] Result fail();
   [[nodiscard]] Result failWith(std::string problem);
@@ -68,7 +74,9 @@ class StoreDatabase {
   const std::string directory_;
   const std::string path_;
   const JsonService& json_;
+  const Clock& clock_;
   SqliteDatabase database_;
+  StoreHoldings holdings_{database_};
   // Have a value while the file is open.
   SqliteStatement begin_;
   SqliteStatement commit_;
@@ -77,10 +85,12 @@ class StoreDatabase {
   std::optional<MetricTable> metrics_;
   std::optional<PowerTable> power_;
   std::optional<RtcTable> rtc_;
-  std::optional<StoreHoldings> holdings_;
   std::optional<StoreTrimmer> trimmer_;
   // Numbers the files that this process began or found; this is the open one's number.
   std::uint64_t fileNumber_ = 1;
+  // Identify the file that was opened last.
+  dev_t device_ = 0;
+  ino_t inode_ = 0;
   StoreBounds bounds_;
   std::string problem_;
 };

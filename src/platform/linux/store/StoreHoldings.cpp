@@ -14,8 +14,7 @@ std::uint32_t userOf(const SqliteStatement& row, int column) {
 // The sums are made here: SQLite would sort the rows by user, payloads included.
 bool StoreHoldings::read() {
   if (hasRead_) return true;
-  hasRead_ = true;
-  holdings_.clear();
+  forget();
   for (std::size_t table = 0; table < kStoreTables.size(); ++table) {
     std::string sql = "SELECT id, user_id, ";
     sql.append(kStoreTables[table].bytes).append(" FROM ").append(kStoreTables[table].name);
@@ -26,7 +25,7 @@ bool StoreHoldings::read() {
       std::size_t at = indexOf(user);
       if (at == kNone) {
         at = holdings_.size();
-        holdings_.push_back({.user = user});
+        append({.user = user});
       }
       holdings_[at].bytes += select.integer(2) + kStoreRowBytes;
       if (holdings_[at].from[table] == 0) holdings_[at].from[table] = select.integer(0);
@@ -40,7 +39,27 @@ bool StoreHoldings::read() {
       if (holding.from[table] == 0) holding.from[table] = *newest + 1;
     }
   }
+  hasRead_ = true;
   return true;
+}
+
+void StoreHoldings::forget() {
+  holdings_.clear();
+  indices_.clear();
+  hasRead_ = false;
+  isInTransaction_ = false;
+}
+
+void StoreHoldings::begin() {
+  atBegin_ = holdings_;
+  isInTransaction_ = true;
+}
+
+void StoreHoldings::undo() {
+  if (!isInTransaction_) return;
+  isInTransaction_ = false;
+  for (std::size_t at = atBegin_.size(); at < holdings_.size(); ++at) indices_.erase(holdings_[at].user);
+  holdings_.swap(atBegin_);
 }
 
 bool StoreHoldings::add(const StoreBatch& batch) {
@@ -79,10 +98,9 @@ std::int64_t StoreHoldings::of(std::uint32_t user) const {
 
 std::size_t StoreHoldings::indexOf(std::uint32_t user) const {
   if (lastFound_ < holdings_.size() && holdings_[lastFound_].user == user) return lastFound_;
-  const auto found = std::find_if(holdings_.begin(), holdings_.end(),
-                                  [&](const StoreHolding& holding) { return holding.user == user; });
-  if (found == holdings_.end()) return kNone;
-  return lastFound_ = static_cast<std::size_t>(found - holdings_.begin());
+  const auto found = indices_.find(user);
+  if (found == indices_.end()) return kNone;
+  return lastFound_ = found->second;
 }
 
 StoreHolding* StoreHoldings::holdingOf(std::uint32_t user) {
@@ -95,8 +113,12 @@ StoreHolding* StoreHoldings::holdingOf(std::uint32_t user) {
     if (!newest) return nullptr;
     made.from[table] = *newest + 1;
   }
-  holdings_.push_back(made);
-  return &holdings_.back();
+  return &append(made);
+}
+
+StoreHolding& StoreHoldings::append(const StoreHolding& holding) {
+  indices_.emplace(holding.user, holdings_.size());
+  return holdings_.emplace_back(holding);
 }
 
 }  // namespace tonewerk

@@ -5,6 +5,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <span>
+#include <unordered_map>
 #include <vector>
 
 #include "platform/linux/store/SqliteDatabase.h"
@@ -23,9 +24,9 @@ struct StoreHolding {
   std::array<std::int64_t, kStoreTables.size()> from{};
 };
 
-// Knows how much each user holds in an open report store. It reads all rows once, and then follows what is
-// inserted and deleted. Rows that another program inserts are not counted. Used on the writer's thread. After
-// a transaction was undone, a new object is needed.
+// Knows how much each user holds in a report store. It reads all rows once, and then follows what is inserted
+// and deleted, also when the same file is closed and opened again. Rows that another program inserts are not
+// counted. Used on the writer's thread.
 class StoreHoldings {
  public:
   // `database` outlives it.
@@ -33,6 +34,14 @@ class StoreHoldings {
 
   // Reads all rows, if that has not been done. False on failure. The database then has the problem.
   [[nodiscard]] bool read();
+  // The file is another one, or damaged: the next read() reads its rows.
+  void forget();
+
+  // What follows belongs to one transaction, until commit(). After a failure, undo() gives back what was held
+  // at begin(); it does nothing outside transactions.
+  void begin();
+  void commit() { isInTransaction_ = false; }
+  void undo();
 
   // Counts the rows of the batch, without its sessions. To be called before they are inserted, in the same
   // transaction. False on failure. The database then has the problem.
@@ -55,11 +64,15 @@ class StoreHoldings {
   // The user's holding, which is made when it is missing: the user's rows will come after all that are there.
   // Null on failure.
   [[nodiscard]] StoreHolding* holdingOf(std::uint32_t user);
+  StoreHolding& append(const StoreHolding& holding);
 
   SqliteDatabase& database_;
   bool hasRead_ = false;
   std::vector<StoreHolding> holdings_;
-  mutable std::size_t lastFound_ = 0;  // neighbouring rows are mostly one user's
+  std::unordered_map<std::uint32_t, std::size_t> indices_;  // in holdings_, by user
+  mutable std::size_t lastFound_ = 0;                       // neighbouring rows are mostly one user's
+  std::vector<StoreHolding> atBegin_;
+  bool isInTransaction_ = false;
 };
 
 // The user of a row, from a column with the user.

@@ -3,11 +3,15 @@
 
 #include <algorithm>
 #include <array>
+#include <chrono>
 #include <cstddef>
+#include <queue>
+#include <span>
 #include <string>
 #include <utility>
 #include <vector>
 
+#include "platform/Clock.h"
 #include "platform/linux/store/StoreSchema.h"
 
 namespace tonewerk {
@@ -173,22 +177,27 @@ class OldestRowsOfUser {
     bool areOthersBetween = false;  // rows of other users, which stay or are marked, too
   };
   // Ends the reads, so that rows can be deleted, and keeps the result.
-  void end() {
+  void endReads() {
     for (std::size_t at = 0; at < marked_.size(); ++at) {
       const OldestRows& table = tables_[at];
       marked_[at] = {{table.first(), table.passed()}, table.areOthersBetween()};
-      holding_->from[at] = table.from();
+      from_[at] = table.from();
     }
-    holding_->bytes = std::max<std::int64_t>(0, left_);
     tables_.clear();
   }
-  // After end(): the marked rows of each table.
+  // After endReads(): the marked rows are not the user's any more.
+  void reduceHolding() {
+    holding_->from = from_;
+    holding_->bytes = std::max<std::int64_t>(0, left_);
+  }
+  // After endReads(): the marked rows of each table.
   const std::array<Marked, kStoreTables.size()>& marked() const { return marked_; }
 
  private:
   StoreHolding* holding_;
   std::int64_t left_;
   bool isDone_ = false;
+  std::array<std::int64_t, kStoreTables.size()> from_{};
   std::vector<OldestRows> tables_;
   std::array<Marked, kStoreTables.size()> marked_;
 };
@@ -212,9 +221,10 @@ std::vector<RowRange> joined(std::vector<RowRange> ranges) {
 
 std::int64_t StoreBounds::walBytes() const { return std::clamp(bytes / 8, kMinWalBytes, kMaxWalBytes); }
 
-StoreTrimmer::StoreTrimmer(SqliteDatabase& database, StoreHoldings& holdings)
+StoreTrimmer::StoreTrimmer(SqliteDatabase& database, StoreHoldings& holdings, const Clock& clock)
     : database_(database),
       holdings_(holdings),
+      clock_(clock),
       countPages_(database.prepare("PRAGMA page_count")),
       countFreePages_(database.prepare("PRAGMA freelist_count")) {
   for (std::size_t at = 0; at < newestIds_.size(); ++at) {
@@ -224,10 +234,12 @@ StoreTrimmer::StoreTrimmer(SqliteDatabase& database, StoreHoldings& holdings)
 }
 
 StoreTrimmer::Outcome StoreTrimmer::trimAge(const StoreBounds& bounds, double now) {
+  const std::chrono::nanoseconds end = clock_.monotonic() + kSliceTime;
   for (int round = 0; round < kRoundsPerSlice; ++round) {
     const std::int64_t deleted = deleteUpTo(now - bounds.seconds);
     if (deleted < 0) return Outcome::kFailed;
     if (deleted == 0) return Outcome::kDone;
+    if (clock_.monotonic() >= end) break;
   }
   return Outcome::kMoreToDo;
 }
@@ -241,11 +253,16 @@ StoreTrimmer::Outcome StoreTrimmer::deleteForSize(std::int64_t fileBytes) {
   // The space that is freed at once lasts for a while: it is a 32nd of the file.
   const std::int64_t high = fileBytes - fileBytes / 32;
   const std::int64_t low = high - fileBytes / 32;
+  const std::chrono::nanoseconds end = clock_.monotonic() + kSliceTime;
+  std::int64_t usedBefore = 0;
   for (int round = 0; round < kRoundsPerSlice; ++round) {
     if (!measure()) return Outcome::kFailed;
     const std::int64_t used = (pages_ - freePages_) * pageBytes_;
     shrinking_ = used > (shrinking_ ? low : high);
     if (!shrinking_) return Outcome::kDone;
+    if (round == 0) usedBefore = used;
+    const bool mayEnd = round > 0 && (used <= fileBytes || usedBefore - used >= kLeastPerSlice);
+    if (mayEnd && clock_.monotonic() >= end) break;
     const std::optional<bool> hasEmptied = emptyNewest(low);
     if (!hasEmptied) return Outcome::kFailed;
     if (*hasEmptied) continue;
@@ -283,9 +300,21 @@ bool StoreTrimmer::measure() {
   return true;
 }
 
+bool StoreTrimmer::begin() {
+  holdings_.begin();
+  return database_.run("BEGIN IMMEDIATE");
+}
+
+bool StoreTrimmer::commit() {
+  if (!database_.run("COMMIT")) return false;
+  holdings_.commit();
+  return true;
+}
+
 // Deletes, of the oldest chunk of every table, the rows that are not younger than `time`. Returns the number
 // of rows, or a negative number on failure.
 std::int64_t StoreTrimmer::deleteUpTo(double time) {
+  if (!begin()) return -1;
   std::int64_t deleted = 0;
   for (const StoreTable& table : kStoreTables) {
     SqliteStatement statement = database_.prepare(
@@ -300,7 +329,7 @@ std::int64_t StoreTrimmer::deleteUpTo(double time) {
     }
     if (step == SqliteStatement::Step::kFailed) return -1;
   }
-  return deleted;
+  return commit() ? deleted : -1;
 }
 
 // The newest row of a table stays, with the exception that oldestRows() names, and may be too large for the
@@ -332,9 +361,11 @@ std::optional<bool> StoreTrimmer::emptyNewest(std::int64_t maxBytes) {
   if (sum <= maxBytes) return false;
   SqliteStatement update = database_.prepare(emptyLargest);
   if (update.step() != SqliteStatement::Step::kRow) return std::nullopt;
+  const std::int64_t left = update.integer(0);
+  if (update.step() != SqliteStatement::Step::kDone) return std::nullopt;
   holdings_.removeRow(user, largest);
-  holdings_.addRow(user, update.integer(0));
-  return update.step() == SqliteStatement::Step::kDone ? std::optional(true) : std::nullopt;
+  holdings_.addRow(user, left);
+  return true;
 }
 
 // Deletes the oldest rows of all tables until they come to `bytes` or a round is full; always those of the
@@ -347,42 +378,49 @@ std::int64_t StoreTrimmer::deleteOldest(std::int64_t bytes) {
     if (!found) return -1;
     newest[at] = *found;
   }
+  // Those without a number in `users` have lost nothing in this round.
+  struct Candidate {
+    std::int64_t left;
+    std::size_t holding;
+    std::size_t user;
+    // Of those who hold the same, the first one comes first.
+    bool operator<(const Candidate& other) const {
+      return left != other.left ? left < other.left : holding > other.holding;
+    }
+  };
+  constexpr std::size_t kNotYet = static_cast<std::size_t>(-1);
+  std::priority_queue<Candidate> candidates;
+  const std::span<StoreHolding> all = holdings_.all();
+  for (std::size_t at = 0; at < all.size(); ++at) {
+    if (all[at].bytes > 0) candidates.push({all[at].bytes, at, kNotYet});
+  }
   std::vector<OldestRowsOfUser> users;
   RoundBudget budget;
-  while (bytes > 0 && !budget.isUsedUp()) {
-    // Those without an entry in `users` have lost nothing in this round.
-    OldestRowsOfUser* largest = nullptr;
-    StoreHolding* added = nullptr;
-    std::int64_t most = 0;
-    std::int64_t second = 0;
-    for (StoreHolding& holding : holdings_.all()) {
-      const auto known = std::find_if(users.begin(), users.end(), [&](const OldestRowsOfUser& user) {
-        return &user.holding() == &holding;
-      });
-      if (known != users.end() && known->isDone()) continue;
-      const std::int64_t left = known == users.end() ? holding.bytes : known->left();
-      if (left <= most) {
-        second = std::max(second, left);
-        continue;
-      }
-      second = std::exchange(most, left);
-      largest = known == users.end() ? nullptr : &*known;
-      added = &holding;
+  while (bytes > 0 && !budget.isUsedUp() && !candidates.empty()) {
+    Candidate candidate = candidates.top();
+    candidates.pop();
+    if (candidate.user == kNotYet) {
+      candidate.user = users.size();
+      users.emplace_back(database_, all[candidate.holding], newest);
     }
-    if (most == 0) break;
-    if (largest == nullptr) largest = &users.emplace_back(database_, *added, newest);
-    while (bytes > 0 && largest->left() >= second) {
-      const std::int64_t passed = largest->pass(budget);
+    OldestRowsOfUser& largest = users[candidate.user];
+    const std::int64_t second = candidates.empty() ? 0 : candidates.top().left;
+    while (bytes > 0 && largest.left() >= second) {
+      const std::int64_t passed = largest.pass(budget);
       if (passed == 0) break;
       bytes -= passed;
     }
+    candidate.left = largest.left();
+    if (!largest.isDone() && candidate.left > 0) candidates.push(candidate);
   }
   if (std::any_of(users.begin(), users.end(),
                   [](const OldestRowsOfUser& user) { return user.hasFailed(); })) {
     return -1;
   }
   // All reads end before the first row is deleted.
-  for (OldestRowsOfUser& user : users) user.end();
+  for (OldestRowsOfUser& user : users) user.endReads();
+  if (!begin()) return -1;
+  for (OldestRowsOfUser& user : users) user.reduceHolding();
   for (std::size_t at = 0; at < kStoreTables.size(); ++at) {
     std::vector<RowRange> mixed;
     for (const OldestRowsOfUser& user : users) {
@@ -395,7 +433,7 @@ std::int64_t StoreTrimmer::deleteOldest(std::int64_t bytes) {
       if (!closeGaps(kStoreTables[at], range)) return -1;
     }
   }
-  return kLookedRowsPerRound - budget.rows;
+  return commit() ? kLookedRowsPerRound - budget.rows : -1;
 }
 
 bool StoreTrimmer::deleteRows(const StoreTable& table, std::uint32_t user, const RowRange& rows) {
@@ -410,14 +448,13 @@ bool StoreTrimmer::deleteRows(const StoreTable& table, std::uint32_t user, const
 // Deleting rows between those of others leaves pages that are half empty, and SQLite joins pages only when
 // two thirds of them are empty. The others' rows would then take up to three times their bytes and, although
 // few, the room of everybody. So they are written again, close together. Each row is written again at most
-// once for each other user.
+// once for each other user. Within a transaction.
 bool StoreTrimmer::closeGaps(const StoreTable& table, const RowRange& rows) {
   const std::string name = "main." + std::string(table.name);
   const std::string kept = "temp.kept_" + std::string(table.name);
   const std::string isMoved =
       " WHERE id BETWEEN ?1 AND ?2 AND " + std::string(table.bytes) + " < " + std::to_string(kSmallRowBytes);
-  if (!database_.run("BEGIN IMMEDIATE; CREATE TABLE IF NOT EXISTS " + kept + " AS SELECT * FROM " + name +
-                     " WHERE false")) {
+  if (!database_.run("CREATE TABLE IF NOT EXISTS " + kept + " AS SELECT * FROM " + name + " WHERE false")) {
     return false;
   }
   SqliteStatement copy =
@@ -425,12 +462,12 @@ bool StoreTrimmer::closeGaps(const StoreTable& table, const RowRange& rows) {
   copy.bind(1, rows.first);
   copy.bind(2, rows.last);
   if (!copy.run()) return false;
-  if (database_.changes() == 0) return database_.run("COMMIT");
+  if (database_.changes() == 0) return true;
   SqliteStatement remove = database_.prepare("DELETE FROM " + name + isMoved);
   remove.bind(1, rows.first);
   remove.bind(2, rows.last);
-  return remove.run() && database_.run("INSERT INTO " + name + " SELECT * FROM " + kept + "; DELETE FROM " +
-                                       kept + "; COMMIT");
+  return remove.run() &&
+         database_.run("INSERT INTO " + name + " SELECT * FROM " + kept + "; DELETE FROM " + kept);
 }
 
 }  // namespace tonewerk

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <array>
+#include <chrono>
 #include <cstdint>
 #include <optional>
 
@@ -9,6 +10,8 @@
 #include "platform/linux/store/StoreHoldings.h"
 
 namespace tonewerk {
+
+class Clock;
 
 // How much the report store keeps.
 struct StoreBounds {
@@ -35,8 +38,9 @@ struct RowRange {
 // than an equal part of what all rows count loses none, however much others record, and one user alone may
 // use the whole file.
 //
-// It works in slices of some milliseconds, so that rows do not wait long to be written. At its bound the file
-// keeps its size: new rows take the pages of deleted ones, and the pages in use are between nine tenths of
+// It works in slices, so that rows do not wait long to be written. A slice is of at most 16 rounds, each of
+// which is a transaction. After kSliceTime it ends earlier, but while the file is over its bound not before it
+// has freed kLeastPerSlice, which is more than a batch of rows adds. At its bound the file keeps its size: new rows take the pages of deleted ones, and the pages in use are between nine tenths of
 // the bound and all of it, unless a single row is larger than the difference. For the bound of age only the
 // oldest rows are checked: rows recorded while the clock was ahead can hold back the rows behind them until
 // they are old enough themselves.
@@ -44,8 +48,12 @@ class StoreTrimmer {
  public:
   enum class Outcome { kDone, kMoreToDo, kFailed };
 
-  // `database` is open and outlives it, and so does `holdings`, which follows what is deleted.
-  StoreTrimmer(SqliteDatabase& database, StoreHoldings& holdings);
+  static constexpr std::chrono::milliseconds kSliceTime{5};
+  static constexpr std::int64_t kLeastPerSlice = 1 << 20;
+
+  // `database` is open and outlives it, and so do `clock` and `holdings`, which follows what is deleted. After
+  // a failure the caller undoes the transactions of both.
+  StoreTrimmer(SqliteDatabase& database, StoreHoldings& holdings, const Clock& clock);
 
   // One slice of deleting for age; `now` is in seconds since 1970. On failure the database has the problem.
   [[nodiscard]] Outcome trimAge(const StoreBounds& bounds, double now);
@@ -57,6 +65,8 @@ class StoreTrimmer {
   [[nodiscard]] Outcome deleteForSize(std::int64_t fileBytes);
   [[nodiscard]] Outcome vacuum(std::int64_t fileBytes);
   [[nodiscard]] bool measure();
+  [[nodiscard]] bool begin();
+  [[nodiscard]] bool commit();
   [[nodiscard]] std::int64_t deleteUpTo(double time);
   [[nodiscard]] std::int64_t deleteOldest(std::int64_t bytes);
   [[nodiscard]] bool deleteRows(const StoreTable& table, std::uint32_t user, const RowRange& rows);
@@ -65,6 +75,7 @@ class StoreTrimmer {
 
   SqliteDatabase& database_;
   StoreHoldings& holdings_;
+  const Clock& clock_;
   // Used after every batch, so they are prepared once.
   SqliteStatement countPages_;
   SqliteStatement countFreePages_;

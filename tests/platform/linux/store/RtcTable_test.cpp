@@ -6,6 +6,7 @@
 
 #include "platform/linux/store/StoreDatabase.h"
 #include "support/TemporaryDirectory.h"
+#include "support/manual/ManualClock.h"
 #include "support/memory/MemoryJsonService.h"
 
 namespace tonewerk {
@@ -59,7 +60,8 @@ class RtcTableTest : public testing::Test {
 
   TemporaryDirectory directory_;
   MemoryJsonService json_;
-  StoreDatabase store_{directory_.path(), json_};
+  ManualClock clock_;
+  StoreDatabase store_{directory_.path(), json_, clock_};
 };
 
 TEST_F(RtcTableTest, AMessageNamesItsSession) {

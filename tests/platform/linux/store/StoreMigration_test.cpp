@@ -12,6 +12,7 @@
 #include "platform/linux/store/StoreReader.h"
 #include "platform/linux/store/StoreSchema.h"
 #include "support/TemporaryDirectory.h"
+#include "support/manual/ManualClock.h"
 #include "support/memory/MemoryJsonService.h"
 
 namespace tonewerk {
@@ -145,7 +146,8 @@ class OldFileTest : public testing::Test {
   TemporaryDirectory directory_;
   MemoryJsonService json_;
   SqliteDatabase file_;
-  StoreDatabase store_{directory_.path(), json_};
+  ManualClock clock_;
+  StoreDatabase store_{directory_.path(), json_, clock_};
 };
 
 class StoreMigrationTest : public OldFileTest {
@@ -186,7 +188,7 @@ TEST_F(StoreMigrationTest, NewRowsFollowTheOldOnes) {
 TEST_F(StoreMigrationTest, MakesTheTablesOfANewFile) {
   EXPECT_EQ(write(), StoreDatabase::Result::kDone);
   const TemporaryDirectory directory;
-  StoreDatabase made(directory.path(), json_);
+  StoreDatabase made(directory.path(), json_, clock_);
   EXPECT_EQ(made.write({}), StoreDatabase::Result::kDone);
   const std::vector<std::string> migrated = rows(kColumns, 6);
   ASSERT_TRUE(file_.open(directory.path("reports.db"), SqliteDatabase::Mode::kReadOnly, kLongEnough));
@@ -203,7 +205,7 @@ TEST_F(FileWithoutUsersTest, KeepsItsRowsAndItsViewsAndGetsTheColumnsOfANewFile)
   const std::vector<std::string> columns = rows(kColumns, 6);
   EXPECT_THAT(columns, Contains("table analytics_row user_id INTEGER 0 0"));
   const TemporaryDirectory directory;
-  StoreDatabase made(directory.path(), json_);
+  StoreDatabase made(directory.path(), json_, clock_);
   EXPECT_EQ(made.write({}), StoreDatabase::Result::kDone);
   ASSERT_TRUE(file_.open(directory.path("reports.db"), SqliteDatabase::Mode::kReadOnly, kLongEnough));
   EXPECT_EQ(columns, rows(kColumns, 6));
