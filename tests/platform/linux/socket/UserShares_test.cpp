@@ -1,10 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
+#include <algorithm>
 #include <chrono>
 #include <functional>
 #include <gmock/gmock.h>
 #include <memory>
 #include <optional>
 #include <string>
+#include <string_view>
+#include <sys/stat.h>
 #include <thread>
 #include <unistd.h>
 #include <vector>
@@ -23,6 +26,7 @@ namespace {
 
 using testing::ElementsAre;
 using testing::HasSubstr;
+using testing::IsEmpty;
 using testing::SizeIs;
 using namespace std::chrono_literals;
 
@@ -53,6 +57,33 @@ class UserSharesTest : public testing::Test {
   }
   static bool isServed(RawClient& client) {
     return client.send(request(Value(1))) && client.response().has_value();
+  }
+
+  // Only for root.
+  std::unique_ptr<RawClient> connectAsOther() {
+    EXPECT_EQ(::chmod(directory.path().c_str(), 0711), 0);
+    EXPECT_EQ(::chmod(path.c_str(), 0666), 0);
+    std::unique_ptr<RawClient> other;
+    runAsOtherUser([&] { other = std::make_unique<RawClient>(path); });
+    return other;
+  }
+
+  // A client, and what it has still to send.
+  struct Sending {
+    std::unique_ptr<RawClient> client;
+    std::string_view left;
+  };
+  // Sends for each until the sockets are full and nobody has read from them for a while.
+  static void sendWhatIsRead(std::vector<Sending>& sendings) {
+    for (int triesWithout = 0; triesWithout < 100; ++triesWithout) {
+      for (Sending& sending : sendings) {
+        if (sending.left.empty()) continue;
+        const std::size_t count = sending.client->sendWithoutWaiting(sending.left);
+        sending.left.remove_prefix(count);
+        if (count > 0) triesWithout = 0;
+      }
+      std::this_thread::sleep_for(1ms);
+    }
   }
 
   TemporaryDirectory directory;
@@ -91,11 +122,7 @@ TEST_F(UserSharesTest, AnotherUserStillConnects) {
   RawClient first(path);
   RawClient second(path);
   EXPECT_TRUE(isServed(first) && isServed(second));
-  ASSERT_EQ(::chmod(directory.path().c_str(), 0711), 0);
-  ASSERT_EQ(::chmod(path.c_str(), 0666), 0);
-  std::unique_ptr<RawClient> other;
-  runAsOtherUser([&] { other = std::make_unique<RawClient>(path); });
-  EXPECT_TRUE(isServed(*other));
+  EXPECT_TRUE(isServed(*connectAsOther()));
 }
 
 TEST_F(UserSharesTest, WhatUnfinishedFramesHoldIsChargedAndGivenBack) {
@@ -114,12 +141,21 @@ TEST_F(UserSharesTest, WhatUnfinishedFramesHoldIsChargedAndGivenBack) {
 TEST_F(UserSharesTest, FramesAboveTheShareAreReadOneAfterTheOther) {
   accounts->totals().setTotal(Resource::kReadBytes, 400'000);
   const std::string frame = request(Value(ValueMap{{"text", std::string(700'000, 'x')}}), "takeMap");
-  std::vector<std::unique_ptr<RawClient>> clients;
-  for (int number = 0; number < 6; ++number) clients.push_back(std::make_unique<RawClient>(path));
-  std::vector<std::thread> senders;
-  for (const auto& client : clients) senders.emplace_back([&] { EXPECT_TRUE(client->send(frame)); });
-  for (const auto& client : clients) EXPECT_TRUE(client->response());
-  for (std::thread& sender : senders) sender.join();
+  std::vector<Sending> sendings(6);
+  for (Sending& sending : sendings) {
+    sending.client = std::make_unique<RawClient>(path);
+    sending.left = std::string_view(frame).substr(0, frame.size() - 1);
+  }
+  for (std::size_t done = 0; done < 6; ++done) {
+    sendWhatIsRead(sendings);
+    EXPECT_LT(account->held(Resource::kReadBytes), 3 * frame.size());
+    const auto isNext = [](const Sending& sending) { return sending.left.empty() && sending.client; };
+    ASSERT_EQ(std::count_if(sendings.begin(), sendings.end(), isNext), 1);
+    Sending& next = *std::find_if(sendings.begin(), sendings.end(), isNext);
+    ASSERT_TRUE(next.client->send(frame.substr(frame.size() - 1)));
+    EXPECT_TRUE(next.client->response());
+    next.client.reset();
+  }
   EXPECT_THAT(record.requests(), SizeIs(6));
   EXPECT_TRUE(becomesTrue([&] { return account->held(Resource::kReadBytes) == 0; }));
 }
@@ -130,14 +166,21 @@ TEST_F(UserSharesTest, AFrameThatNeverEndsLetsAnotherOneOnceItsConnectionHasGone
   std::optional<RawClient> stuck(path);
   ASSERT_TRUE(stuck->send(frame.substr(0, 600'000)));
   ASSERT_TRUE(becomesTrue([&] { return account->held(Resource::kReadBytes) >= 600'000; }));
-  RawClient other(path);
-  std::thread sender([&] { EXPECT_TRUE(other.send(frame)); });
+  std::vector<Sending> sendings(1);
+  Sending& other = sendings.front();
+  other.client = std::make_unique<RawClient>(path);
+  other.left = frame;
+  sendWhatIsRead(sendings);
+  EXPECT_FALSE(other.left.empty());
+  EXPECT_THAT(record.requests(), IsEmpty());
   stuck.reset();
-  EXPECT_TRUE(other.response());
-  sender.join();
+  EXPECT_TRUE(other.client->send(other.left));
+  EXPECT_TRUE(other.client->response());
 }
 
 TEST_F(UserSharesTest, AUserWithoutRoomForRequestsIsNotReadUntilThereIsSome) {
+  if (::geteuid() != 0) GTEST_SKIP() << "only root can connect as another user";
+  const std::unique_ptr<RawClient> another = connectAsOther();
   const std::uint64_t all = accounts->totals().total(Resource::kUnfinishedBytes);
   RawClient client(path);
   ASSERT_TRUE(isServed(client));
@@ -146,7 +189,10 @@ TEST_F(UserSharesTest, AUserWithoutRoomForRequestsIsNotReadUntilThereIsSome) {
   RawClient other(path);
   ASSERT_TRUE(other.send(request(Value(6))));
   EXPECT_TRUE(becomesTrue([&] { return account->held(Resource::kConnections) == 2; }));
-  EXPECT_THAT(record.requests(), SizeIs(1));
+  // Whoever has a turn after these two has seen that they were looked at.
+  constexpr int kRoundTrips = 10;
+  for (int number = 0; number < kRoundTrips; ++number) ASSERT_TRUE(isServed(*another));
+  EXPECT_THAT(record.requests(), SizeIs(1 + kRoundTrips));
   account->give(Resource::kUnfinishedBytes, all);
   EXPECT_TRUE(client.response());
   EXPECT_TRUE(other.response());
