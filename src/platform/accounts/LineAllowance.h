@@ -19,8 +19,8 @@ class LineAllowance {
     std::uint32_t perSecond;
   };
 
-  // Lines count against `all`, too, unless that is null, and so do those that are held back. `clock` and `all`
-  // outlive the object.
+  // Lines count against `all`, too, unless that is null, and so do those that are held back. `clock` and
+  // `all` outlive the object.
   LineAllowance(const Clock& clock, Rate rate, LineAllowance* all = nullptr);
 
   // Asks to write one line. False, and the line is counted, when it is to be held back.

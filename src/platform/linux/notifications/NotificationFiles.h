@@ -36,8 +36,8 @@ class NotificationFiles {
   //
   // A directory with the sticky bit keeps a name for the user who posted it first: both functions then fail
   // for others, with std::errc::permission_denied or operation_not_permitted. But for the directory's owner
-  // they replace the file by one of its own, whatever it is, unless it is a directory. The first function then
-  // keeps the state that it can read, or else sets 0.
+  // they replace the file by one of its own, whatever it is, unless it is a directory. The first function
+  // then keeps the state that it can read, or else sets 0.
   [[nodiscard]] std::error_code post(std::string_view name) const;
   // Posts the name with a new state. Readers see either the old file or the new one.
   [[nodiscard]] std::error_code post(std::string_view name, std::uint64_t state) const;
