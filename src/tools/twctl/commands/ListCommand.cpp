@@ -30,7 +30,7 @@ void list(Tool& tool) {
 }  // namespace
 
 void addListCommand(CLI::App& app, Tool& tool) {
-  CLI::App& command = addCommand(app, tool, "list", "The sessions of all clients");
+  CLI::App& command = addCommand(app, tool, "list", "The sessions that the caller may reach");
   command.callback([&tool] { list(tool); });
 }
 

@@ -97,10 +97,7 @@ void tail(Tool& tool, const TailOptions& options) {
 
 void addTailCommand(CLI::App& app, Tool& tool) {
   CLI::App& command = addCommand(app, tool, "tail", "Messages as they arrive, until interrupted");
-  command.footer(
-      "Who reads too slowly misses messages, and is told how many. Only for the user that the daemon runs "
-      "as,\n"
-      "and root.");
+  command.footer("Who reads too slowly misses messages, and is told how many. Only for trusted users.");
   const auto options = std::make_shared<TailOptions>();
   command.add_option("--id", options->reporterIDs, "Only a session's; may be given several times")
       ->allow_extra_args(false)

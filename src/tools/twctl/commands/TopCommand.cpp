@@ -143,9 +143,9 @@ void top(Tool& tool, double interval) {
 void addTopCommand(CLI::App& app, Tool& tool) {
   CLI::App& command = addCommand(app, tool, "top", "What sessions receive, as it happens, the busiest first");
   command.footer(
-      "On a terminal until q or Ctrl-C; elsewhere, and with --json, once, after one interval. Only for the "
-      "user\n"
-      "that the daemon runs as, and root.");
+      "On a terminal until q or Ctrl-C; elsewhere, and with --json, once, after one interval. Only for "
+      "trusted\n"
+      "users.");
   const auto interval = std::make_shared<double>(1.0);
   command.add_option("--interval", *interval, "Over so many seconds messages are counted (1)")
       ->check(problemWithSeconds)
