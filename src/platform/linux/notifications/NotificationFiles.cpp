@@ -139,8 +139,8 @@ std::error_code NotificationFiles::post(std::string_view name) const {
 }
 
 // A state that another writer sets meanwhile is lost, as if it had been set before. The other user may have
-// left a file without rights for us, a pipe or a link, which must not keep the name from the directory's owner.
-// So only the directory's rights decide, when the file is replaced.
+// left a file without rights for us, a pipe or a link, which must not keep the name from the directory's
+// owner. So only the directory's rights decide, when the file is replaced.
 std::error_code NotificationFiles::takeOver(std::string_view name) const {
   std::error_code error;
   const std::optional<std::uint64_t> kept = state(name, error);

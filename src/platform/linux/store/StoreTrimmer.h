@@ -38,14 +38,14 @@ struct RowRange {
 // than an equal part of what all rows count loses none, however much others record, and one user alone may
 // use the whole file.
 //
-// It works in slices, so that rows do not wait long to be written. A slice has at most 16 rounds, each of which
-// is a transaction. After kSliceTime it ends earlier, but while the file is over its bound not before it has
-// freed kLeastPerSlice, which is more than a batch of rows adds.
+// It works in slices, so that rows do not wait long to be written. A slice has at most 16 rounds, each of
+// which is a transaction. After kSliceTime it ends earlier, but while the file is over its bound not before it
+// has freed kLeastPerSlice, which is more than a batch of rows adds.
 //
 // At its bound the file keeps its size: new rows take the pages of deleted ones, and the pages in use are
 // between nine tenths of the bound and all of it, unless a single row is larger than the difference. For the
-// bound of age only the oldest rows are checked: rows recorded while the clock was ahead can hold back the rows
-// behind them until they are old enough themselves.
+// bound of age only the oldest rows are checked: rows recorded while the clock was ahead can hold back the
+// rows behind them until they are old enough themselves.
 class StoreTrimmer {
  public:
   enum class Outcome { kDone, kMoreToDo, kFailed };
@@ -53,8 +53,8 @@ class StoreTrimmer {
   static constexpr std::chrono::milliseconds kSliceTime{5};
   static constexpr std::int64_t kLeastPerSlice = 1 << 20;
 
-  // `database` is open and outlives it, and so do `clock` and `holdings`, which follows what is deleted. After
-  // a failure the caller undoes the transactions of both.
+  // `database` is open and outlives it, and so do `clock` and `holdings`, which follows what is deleted.
+  // After a failure the caller undoes the transactions of both.
   StoreTrimmer(SqliteDatabase& database, StoreHoldings& holdings, const Clock& clock);
 
   // One slice of deleting for age; `now` is in seconds since 1970. On failure the database has the problem.
