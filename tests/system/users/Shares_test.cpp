@@ -138,6 +138,7 @@ TEST_F(SharesTest, MessagesForSessionsThatDoNotExistHaveAFewLinesInTheLog) {
   constexpr std::size_t kRequests = 256;
   start(kAlice, {"unknown", std::to_string(kRequests), "4000"});
   EXPECT_LE(logLines(), before + kRequests);
+  EXPECT_GE(logLinesWith("failed to find reporting session", "others"), 1U);
 }
 
 TEST_F(SharesTest, ATextWithALineFeedIsPartOfOneRecordOfTheLog) {
