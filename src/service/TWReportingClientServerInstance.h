@@ -104,8 +104,8 @@ class TWReportingClientServerInstance final
   void deliver(const Delegate& delegate, ValueMap message, AudioEventCategory messageCategory,
                AudioEventType type, const ReporterIDs& reporterIDs, ServiceRequest& request);
 
-  // Runs `body` with this object, the delegate and the reply: at once on the work queue, else in a turn of the
-  // user.
+  // Runs `body` with this object, the delegate and the reply: at once on the work queue, else in a turn of
+  // the user.
   template <typename Body>
   void onWorkQueue(ServiceRequest request, Body body);
 

@@ -41,8 +41,8 @@ class TWReportingServiceExport final : public RequestHandler {
   void expectMessage(ReporterID session) override { object_->expectMessage(session); }
   ShapeTable* shapes() override { return shapes_.get(); }
   bool isTurnOver() const override { return turns_.isTurnOver(); }
-  // True for a trusted user's request to end the process, which does not wait for the work queue. But when the connection
-  // has asked to be an onlooker and may be one by now, the answer to that comes first.
+  // True for a trusted user's request to end the process, which does not wait for the work queue. But when
+  // the connection has asked to be an onlooker and may be one by now, the answer to that comes first.
   bool isUrgent(std::size_t method) override;
 
  private:

@@ -87,8 +87,8 @@ class TurnQueue : public std::enable_shared_from_this<TurnQueue> {
            (othersWait_.load(std::memory_order_relaxed) && isTimeOver());
   }
 
-  // The same for a piece of long steps, such as the stops of many sessions: also true after a turn's time when
-  // nobody waits, so that the serial queue's other work comes in between.
+  // The same for a piece of long steps, such as the stops of many sessions: also true after a turn's time
+  // when nobody waits, so that the serial queue's other work comes in between.
   bool isTurnOverAfterLongStep() const { return running_ != nullptr && (isTurnOver() || isTimeOver()); }
 
   // From now on no user waits for room. Returns when everything that was added has run. After kLongestFinish,

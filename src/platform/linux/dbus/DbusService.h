@@ -30,9 +30,9 @@ struct DbusNames {
 // the bus.
 class DbusService {
  public:
-  // The most names at once, those included whose users are not known yet or that are about to be refused. Each
-  // needs a match rule of the bus, and a system bus allows 512 of them. How many clients users may have, see
-  // Resource::kBusConnections.
+  // The most names at once, those included whose users are not known yet or that are about to be refused.
+  // Each needs a match rule of the bus, and a system bus allows 512 of them. Resource::kBusConnections says
+  // how many clients users may have.
   static constexpr std::size_t kMaxClients = 480;
 
   enum class End {

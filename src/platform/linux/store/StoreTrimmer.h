@@ -39,8 +39,8 @@ struct RowRange {
 // use the whole file.
 //
 // It works in slices, so that rows do not wait long to be written. A slice has at most 16 rounds, each of
-// which is a transaction. After kSliceTime it ends earlier, but while the file is over its bound not before it
-// has freed kLeastPerSlice, which is more than a batch of rows adds.
+// which is a transaction. After kSliceTime it ends earlier, but while the file is over its bound not before
+// it has freed kLeastPerSlice, which is more than a batch of rows adds.
 //
 // At its bound the file keeps its size: new rows take the pages of deleted ones, and the pages in use are
 // between nine tenths of the bound and all of it, unless a single row is larger than the difference. For the
