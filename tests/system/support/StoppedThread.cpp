@@ -24,8 +24,9 @@ pid_t findThread(pid_t process, const std::string& name) {
 }  // namespace
 
 StoppedThread::StoppedThread(pid_t process, const std::string& name) {
-  const pid_t found = findThread(process, name);
-  EXPECT_GT(found, 0) << "no thread " << name;
+  // A thread names itself when it begins to run.
+  pid_t found = -1;
+  EXPECT_TRUE(waitUntil([&] { return (found = findThread(process, name)) > 0; })) << "no thread " << name;
   if (found <= 0) return;
   EXPECT_EQ(ptrace(PTRACE_SEIZE, found, nullptr, nullptr), 0) << std::strerror(errno);
   EXPECT_EQ(ptrace(PTRACE_INTERRUPT, found, nullptr, nullptr), 0) << std::strerror(errno);
