@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/notifications/NotificationPace.h"
 
+#include <atomic>
 #include <chrono>
 #include <gmock/gmock.h>
 #include <optional>
@@ -129,7 +130,7 @@ TEST_F(NotificationPaceTest, NothingIsToldAfterTheEnd) {
 TEST(NotificationPaceThreadsTest, MayEndWhileItTells) {
   TimerThread timers;
   for (int round = 0; round < 3; ++round) {
-    int count = 0;
+    std::atomic<int> count = 0;
     NotificationPace pace(timers, [&](std::string_view) { ++count; });
     pace.add("a");
     std::jthread poster([&](const std::stop_token& stop) {
@@ -139,7 +140,7 @@ TEST(NotificationPaceThreadsTest, MayEndWhileItTells) {
     while (std::chrono::steady_clock::now() < end) std::this_thread::yield();
     poster.request_stop();
     poster.join();
-    EXPECT_GE(count, 1);
+    EXPECT_GE(count.load(), 1);
   }
 }
 
