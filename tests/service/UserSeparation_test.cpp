@@ -53,8 +53,8 @@ class UserSeparationTest : public ServiceTest {
  protected:
   UserSeparationTest() : ServiceTest({&SlowWorker::kWorkerClass}) { SlowWorker::clock = &test.clock; }
 
-  Arguments messageTo(const Argument& identifiers, std::string text = "hello") {
-    return {ValueMap{{"text", std::move(text)}}, kCategory, kType, identifiers};
+  Arguments messageTo(const Argument& identifiers, const std::string& text = "hello") {
+    return {ValueMap{{"text", text}}, kCategory, kType, identifiers};
   }
   // The texts that a session has stored.
   std::vector<std::string> textsOf(std::size_t client, ReporterID reporterID) {

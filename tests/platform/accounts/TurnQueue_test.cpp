@@ -22,7 +22,7 @@ using Progress = TurnQueue::Progress;
 
 class TurnQueueTest : public testing::Test {
  protected:
-  ~TurnQueueTest() override { turns->close(); }
+  void TearDown() override { turns->close(); }
 
   // A piece that takes `time` in one go.
   void add(const std::shared_ptr<Account>& account, std::string name, std::chrono::nanoseconds time = 0ns) {
