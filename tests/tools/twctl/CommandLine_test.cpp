@@ -371,16 +371,25 @@ TEST_F(CommandLineTest, PlaysTheExamples) {
   }
 }
 
+// The store of a daemon that has run before. It is written when this ends.
+struct DaemonsStore {
+  DaemonsStore(const std::string& directory, const JsonService& json)
+      : store(directory, json, preferences, clock, accounts, category) {}
+
+  MemoryLog log;
+  const LogCategory category{log, "com.orvane.tonewerk", "twrs"};
+  const MemoryPreferenceStore preferences;
+  ManualClock clock;
+  Accounts accounts{990, clock};
+  ReportStore store;
+};
+
 // Runs twctl with a store that has three events.
 class EventsCommandTest : public CommandLineTest {
  protected:
   void store() {
-    MemoryLog log;
-    const LogCategory category(log, "com.orvane.tonewerk", "twrs");
-    const MemoryPreferenceStore preferences;
-    ManualClock clock;
-    Accounts accounts(990, clock);
-    ReportStore store(directory_.path("state"), json_, preferences, clock, accounts, category);
+    DaemonsStore daemons(directory_.path("state"), json_);
+    ReportStore& store = daemons.store;
     store.recordEvent(1'763'633'880.0, "com.orvane.a", {{"n", 1}});
     store.recordEvent(1'763'633'890.5, "com.orvane.b", {{"n", 2}});
     store.recordEvent(1'763'633'900.0, "com.orvane.a", {{"n", 3}});
@@ -410,12 +419,8 @@ TEST_F(EventsCommandTest, GivesEventsToPrograms) {
 
 TEST_F(EventsCommandTest, PrintsNothingThatControlsATerminal) {
   {
-    MemoryLog log;
-    const LogCategory category(log, "com.orvane.tonewerk", "twrs");
-    const MemoryPreferenceStore preferences;
-    ManualClock clock;
-    Accounts accounts(990, clock);
-    ReportStore store(directory_.path("state"), json_, preferences, clock, accounts, category);
+    DaemonsStore daemons(directory_.path("state"), json_);
+    ReportStore& store = daemons.store;
     store.recordEvent(1'763'633'880.0, "com.orvane.a\x1b\n", {{"k\x7F", "v\xC2\x9B\xE2\x80\xAE"}});
   }
   EXPECT_EQ(run({"events"}), kDone);
@@ -438,12 +443,8 @@ TEST_F(EventsCommandTest, TakesTimes) {
 class MetricsCommandTest : public CommandLineTest {
  protected:
   void store() {
-    MemoryLog log;
-    const LogCategory category(log, "com.orvane.tonewerk", "twrs");
-    const MemoryPreferenceStore preferences;
-    ManualClock clock;
-    Accounts accounts(990, clock);
-    ReportStore store(directory_.path("state"), json_, preferences, clock, accounts, category);
+    DaemonsStore daemons(directory_.path("state"), json_);
+    ReportStore& store = daemons.store;
     const auto record = [&](double second, std::uint32_t identifier, std::string bytes) {
       store.record(MetricRow{1'763'633'880.0 + second, identifier, std::move(bytes)});
     };
@@ -490,12 +491,8 @@ TEST_F(MetricsCommandTest, TheLimitTakesTheNewest) {
 class PowerCommandTest : public CommandLineTest {
  protected:
   void store() {
-    MemoryLog log;
-    const LogCategory category(log, "com.orvane.tonewerk", "twrs");
-    const MemoryPreferenceStore preferences;
-    ManualClock clock;
-    Accounts accounts(990, clock);
-    ReportStore store(directory_.path("state"), json_, preferences, clock, accounts, category);
+    DaemonsStore daemons(directory_.path("state"), json_);
+    ReportStore& store = daemons.store;
     store.recordEvent(1'763'633'880.0, "com.orvane.a", {{"EngineOnDuration", 100}});
     const auto record = [&](double second, const char* name, ValueMap payload) {
       store.record(PowerRow{1'763'633'880.0 + second, 28, name, std::move(payload)});
@@ -535,12 +532,8 @@ TEST_F(PowerCommandTest, ShowsEventsAndTheTotalsOfTheirDurationsToPeople) {
 
 TEST_F(PowerCommandTest, PrintsNothingThatControlsATerminal) {
   {
-    MemoryLog log;
-    const LogCategory category(log, "com.orvane.tonewerk", "twrs");
-    const MemoryPreferenceStore preferences;
-    ManualClock clock;
-    Accounts accounts(990, clock);
-    ReportStore store(directory_.path("state"), json_, preferences, clock, accounts, category);
+    DaemonsStore daemons(directory_.path("state"), json_);
+    ReportStore& store = daemons.store;
     store.record(PowerRow{1'763'633'880.0,
                           28,
                           "Flumen_Haptics_EngineOnDuration",
