@@ -107,7 +107,7 @@ class TurnQueue : public std::enable_shared_from_this<TurnQueue> {
     std::chrono::nanoseconds deficit{0};
     std::chrono::nanoseconds idleSince{0};
     enum class State { kIdle, kReady, kRunning, kWaiting } state = State::kIdle;
-    bool hasWaitedLong = false;  // its account's room does not count until there is some
+    std::atomic<bool> hasWaitedLong = false;  // its account's room does not count until there is some
     std::unique_ptr<Timer> timer;
   };
 

@@ -7,6 +7,7 @@
 #include <list>
 #include <string>
 
+#include "platform/accounts/Resource.h"
 #include "platform/linux/dbus/DbusCaller.h"
 #include "platform/linux/dbus/DbusValues.h"
 #include "platform/linux/dbus/PrivateBus.h"
@@ -109,20 +110,22 @@ TEST_F(MemoryReleaseTest, OfManySmallClientsIsTheSystemsAgainWhenTheirSessionsEn
 
 TEST_F(MemoryReleaseTest, OfAStormOfFramesThatNeverEndIsTheSystemsAgain) {
   // Small arrays of two bytes each, which would need many times their size if they were decoded before the
-  // frame ends. No single connection sends enough to cause a check.
-  constexpr std::size_t kBytes = std::size_t{400} << 10;
+  // frame ends. No single connection sends enough to cause a check. All together are within the user's share.
+  constexpr std::size_t kBytes = std::size_t{480} << 10;
+  constexpr std::size_t kFrames = 100;
+  static_assert(kFrames * kBytes < kResources[indexOf(Resource::kReadBytes)].total / 2);
   std::string frame = packed::arrayHeader(4) + packed::integer(0) + packed::integer(1) +
                       packed::text("sendMessage") + packed::arrayHeader(4) +
                       packed::arrayHeader(kMaxFrameBytes);
   while (frame.size() < kBytes) frame += std::string("\x91\x00", 2);
   std::list<RawClient> storm;
-  for (int count = 0; count < 300; ++count) {
+  for (std::size_t count = 0; count < kFrames; ++count) {
     storm.emplace_back(daemon.socketPath());
     ASSERT_TRUE(storm.back().send(frame));
   }
   DaemonClient witness = connect();
   witness.create(kSession, kLongFormAudio);
-  EXPECT_TRUE(waitUntil([this] { return daemon.residentBytes() > idle + 100 * kMegabyte; }));
+  EXPECT_TRUE(waitUntil([this] { return daemon.residentBytes() > idle + 40 * kMegabyte; }));
   storm.clear();
   expectTheMemoryBack();
   EXPECT_EQ(witness.serviceType(kSession), kLongFormAudio);

@@ -85,7 +85,7 @@ TEST_F(SharesTest, AUserThatFillsTheStoreErasesNobodyElsesRows) {
     bob.send({{"number", number}}, kPlayback, kTypeStart, {kSession});
   }
   ASSERT_TRUE(waitUntil([&] { return recorded(kEvent).size() == kRows; }));
-  start(kAlice, {"large", "1000000", "300"});
+  start(kAlice, {"large", "1000000", "60"});  // more than three times what the store may hold
   // The daemon looks at the size every ten seconds while reports come in.
   const auto hasLooked = std::chrono::steady_clock::now() + std::chrono::seconds(12);
   int last = 0;
