@@ -5,7 +5,9 @@
 #include <cstring>
 #include <filesystem>
 #include <gtest/gtest.h>
+#include <sstream>
 #include <sys/ptrace.h>
+#include <sys/syscall.h>
 #include <sys/wait.h>
 
 #include "system/support/ChildProcess.h"
@@ -21,6 +23,22 @@ pid_t findThread(pid_t process, const std::string& name) {
   return -1;
 }
 
+// Whether a stopped thread was waiting for work. One that was at work may hold a lock that others need.
+bool isWaiting(pid_t process, pid_t thread) {
+  std::istringstream call(
+      textOfFile("/proc/" + std::to_string(process) + "/task/" + std::to_string(thread) + "/syscall"));
+  long number = -1;
+  call >> number;
+  return number == SYS_epoll_wait || number == SYS_epoll_pwait || number == SYS_ppoll ||
+         number == SYS_poll || number == SYS_futex;
+}
+
+bool stop(pid_t thread) {
+  if (ptrace(PTRACE_INTERRUPT, thread, nullptr, nullptr) != 0) return false;
+  int status = 0;
+  return waitpid(thread, &status, __WALL) == thread && WIFSTOPPED(status);
+}
+
 }  // namespace
 
 StoppedThread::StoppedThread(pid_t process, const std::string& name) {
@@ -29,10 +47,12 @@ StoppedThread::StoppedThread(pid_t process, const std::string& name) {
   EXPECT_TRUE(waitUntil([&] { return (found = findThread(process, name)) > 0; })) << "no thread " << name;
   if (found <= 0) return;
   EXPECT_EQ(ptrace(PTRACE_SEIZE, found, nullptr, nullptr), 0) << std::strerror(errno);
-  EXPECT_EQ(ptrace(PTRACE_INTERRUPT, found, nullptr, nullptr), 0) << std::strerror(errno);
-  int status = 0;
-  EXPECT_EQ(waitpid(found, &status, __WALL), found);
-  EXPECT_TRUE(WIFSTOPPED(status)) << status;
+  EXPECT_TRUE(waitUntil([&] {
+    if (!stop(found)) return false;
+    if (isWaiting(process, found)) return true;
+    ptrace(PTRACE_CONT, found, nullptr, nullptr);
+    return false;
+  })) << "the thread never waits";
   thread_ = found;
 }
 

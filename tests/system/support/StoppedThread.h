@@ -6,8 +6,8 @@
 
 namespace tonewerk {
 
-// Stops one thread of a child process, as a thread would stand still that hangs. The other threads go on. The
-// thread goes on when the object is destroyed, on the test's thread that made it.
+// Stops one thread of a child process while it waits for work, as a thread would stand still that hangs. The
+// other threads go on. The thread goes on when the object is destroyed, on the test's thread that made it.
 class StoppedThread {
  public:
   // `name` is the thread's, as the kernel has it. Adds a test failure when there is no such thread.
