@@ -29,8 +29,8 @@ bool isWaiting(pid_t process, pid_t thread) {
       textOfFile("/proc/" + std::to_string(process) + "/task/" + std::to_string(thread) + "/syscall"));
   long number = -1;
   call >> number;
-  return number == SYS_epoll_wait || number == SYS_epoll_pwait || number == SYS_ppoll ||
-         number == SYS_poll || number == SYS_futex;
+  return number == SYS_epoll_wait || number == SYS_epoll_pwait || number == SYS_ppoll || number == SYS_poll ||
+         number == SYS_futex;
 }
 
 bool stop(pid_t thread) {
