@@ -20,3 +20,4 @@ check 'by its tool' says 'phys_footprint' journalctl --boot --unit $unit --outpu
 check 'beside what root wrote the daemon keeps its own' \
   says VidroInvalidXyIDRlastRun cat /var/lib/tonewerk/preferences/com.orvane.tonewerk.twreporting.toml
 check "and the day's captures" says accepted cat /var/lib/tonewerk/preferences/com.orvane.tonewerk.captures.toml
+twctl --system defaults delete com.orvane.tonewerk.service trusted_users

@@ -13,6 +13,8 @@ systemctl daemon-reload
 write_preference() { twctl --system defaults write "$@"; }
 check 'root writes preferences' write_preference com.orvane.tonewerk.twreporting VidroInvalidXyBackOffSeconds 3600
 write_preference com.orvane.tonewerk.twreporting enable_whirlcap true
+# As on a device whose audio server has a user of its own: only trusted users have memory logs.
+write_preference com.orvane.tonewerk.service trusted_users '["player"]'
 write_preference com.orvane.linkreport backends '["local", "http://127.0.0.1:4318"]'
 check 'which stay the daemon'\''s' \
   equal "$(stat --format '%U:%G' /var/lib/tonewerk/preferences /var/lib/tonewerk/preferences/* /var/lib/tonewerk/preferences/.lock | sort -u)" tonewerk:tonewerk
