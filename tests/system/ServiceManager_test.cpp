@@ -81,7 +81,8 @@ TEST_F(ServiceManagerSystemTest, IsToldNothingWhileTheWorkQueueHangsAndTheLogNam
   ASSERT_TRUE(daemon.start());
   EXPECT_EQ(manager.waitForLine("WATCHDOG=1"), "WATCHDOG=1");
   {
-    const StoppedThread workQueue(daemon.process().identifier(), "eporting.server");
+    const StoppedThread workQueue(daemon.process().identifier(), "eporting.server",
+                                  StoppedThread::WaitsIn::kFutex);
     daemon.process().signal(SIGUSR1);  // the status is work for it
     ASSERT_TRUE(waitForLogLine("the work queue has made no progress for 0 s"));
     manager.take();
@@ -99,7 +100,8 @@ TEST_F(ServiceManagerSystemTest, IsToldNothingWhileTheMessagingThreadHangs) {
   ASSERT_TRUE(daemon.start());
   EXPECT_EQ(manager.waitForLine("WATCHDOG=1"), "WATCHDOG=1");
   {
-    const StoppedThread messaging(daemon.process().identifier(), "tw-messaging");
+    const StoppedThread messaging(daemon.process().identifier(), "tw-messaging",
+                                  StoppedThread::WaitsIn::kEpoll);
     manager.take();
     daemon.process().signal(SIGUSR1);
     EXPECT_TRUE(waitForLogLine("status: clients"));  // the others go on

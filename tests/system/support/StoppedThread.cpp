@@ -23,15 +23,14 @@ pid_t findThread(pid_t process, const std::string& name) {
   return -1;
 }
 
-// Whether a stopped thread was waiting for work. One that was at work may hold a lock that others need. The
-// messaging thread waits for work in the epoll only, and for locks in a futex.
-bool isWaiting(pid_t process, pid_t thread, const std::string& name) {
+// Whether a stopped thread was waiting for work. One that was at work may hold a lock that others need.
+bool isWaiting(pid_t process, pid_t thread, StoppedThread::WaitsIn waitsIn) {
   std::istringstream call(
       textOfFile("/proc/" + std::to_string(process) + "/task/" + std::to_string(thread) + "/syscall"));
   long number = -1;
   call >> number;
-  return number == SYS_epoll_wait || number == SYS_epoll_pwait ||
-         (number == SYS_futex && name != "tw-messaging");
+  if (waitsIn == StoppedThread::WaitsIn::kFutex) return number == SYS_futex;
+  return number == SYS_epoll_wait || number == SYS_epoll_pwait;
 }
 
 bool stop(pid_t thread) {
@@ -42,7 +41,7 @@ bool stop(pid_t thread) {
 
 }  // namespace
 
-StoppedThread::StoppedThread(pid_t process, const std::string& name) {
+StoppedThread::StoppedThread(pid_t process, const std::string& name, WaitsIn waitsIn) {
   // A thread names itself when it begins to run.
   pid_t found = -1;
   EXPECT_TRUE(waitUntil([&] { return (found = findThread(process, name)) > 0; })) << "no thread " << name;
@@ -50,7 +49,7 @@ StoppedThread::StoppedThread(pid_t process, const std::string& name) {
   EXPECT_EQ(ptrace(PTRACE_SEIZE, found, nullptr, nullptr), 0) << std::strerror(errno);
   EXPECT_TRUE(waitUntil([&] {
     if (!stop(found)) return false;
-    if (isWaiting(process, found, name)) return true;
+    if (isWaiting(process, found, waitsIn)) return true;
     ptrace(PTRACE_CONT, found, nullptr, nullptr);
     return false;
   })) << "the thread never waits";
