@@ -395,7 +395,8 @@ void ClientOutbox::disconnected(twr_status why) {
 void ClientOutbox::takeBack(OutgoingFrame frame) {
   if (frame.origin == OutgoingFrame::Origin::kRecreation) return;
   // The reply itself is in the command, which waits for it again in the queue.
-  if (frame.identifier != 0) (void)replies_.take(frame.identifier);
+  // Without an entry, the daemon has answered a request that it cannot have read. The reply was called then.
+  if (frame.identifier != 0 && !replies_.take(frame.identifier)) frame.command.reply = {};
   if (frame.command.session != nullptr) {
     ReportedLosses& reported = frame.command.session->reported;
     reported.counted = frame.reportedBefore;

@@ -312,6 +312,25 @@ TEST_F(ClientOutboxTest, IgnoresAnAnswerToNoRequest) {
   EXPECT_THAT(told(), IsEmpty());
 }
 
+// The request is sent again after the connection has broken. Its caller may have freed the context by then.
+TEST_F(ClientOutboxTest, CallsAReplyOnceWhenTheDaemonAnswersWhatItCannotHaveRead) {
+  const auto one = session();
+  outbox->connected();
+  sayAll();
+  change(*one, make(Kind::kStart), reply("start"));
+  change(*one, configuration({{"a", 1}}), reply("configuration"));
+  for (const RpcFrame& frame : framesOf(outbox->unsent())) {
+    if (frame.kind == RpcFrame::Kind::kRequest) requests[frame.method] = frame.identifier;
+  }
+  answer("startReportingSessionForID");
+  answer("setConfiguration");
+  EXPECT_THAT(told(), ElementsAre("start: done", "configuration: done"));
+  reconnect();
+  sayAll();
+  outbox->end();
+  EXPECT_THAT(told(), IsEmpty());
+}
+
 // Otherwise a queue of small requests would take a multiple of its bound.
 TEST_F(ClientOutboxTest, CountsTheMemoryOfWhatWaitsAndNotOnlyItsBytes) {
   const auto one = session();
