@@ -11,6 +11,8 @@
 #include <string>
 #include <string_view>
 
+#include "bridges/pipewire/graph/PodCheck.h"
+
 namespace tonewerk {
 
 namespace {
@@ -72,6 +74,7 @@ std::vector<double> floatsOf(const spa_pod& pod) {
 
 StreamVolume volumeOf(const spa_pod& properties) {
   StreamVolume volume;
+  if (!isWellFormed(properties)) return volume;
   if (const spa_pod_prop* mute = spa_pod_find_prop(&properties, nullptr, SPA_PROP_mute)) {
     volume.mute = booleanOf(mute->value);
   }
@@ -87,6 +90,7 @@ StreamVolume volumeOf(const spa_pod& properties) {
 std::optional<AudioFormat> formatOf(const spa_pod& format) {
   std::uint32_t mediaType = 0;
   std::uint32_t mediaSubtype = 0;
+  if (!isWellFormed(format)) return std::nullopt;
   if (spa_format_parse(&format, &mediaType, &mediaSubtype) < 0) return std::nullopt;
   if (mediaType != SPA_MEDIA_TYPE_audio) return std::nullopt;
 

@@ -10,8 +10,9 @@ struct spa_pod;
 
 namespace tonewerk {
 
-// These functions read a node's parameters from PipeWire's binary form. Both accept any well-formed pod; a
-// value that the pod does not hold is missing in the result.
+// These functions read a node's parameters from PipeWire's binary form. Both accept any pod whose own size is
+// right; a value that the pod does not hold is missing in the result. Of a pod that is not well-formed
+// (PodCheck.h), every value is missing.
 
 StreamVolume volumeOf(const spa_pod& properties);
 

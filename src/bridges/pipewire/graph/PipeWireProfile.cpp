@@ -5,6 +5,8 @@
 #include <spa/pod/iter.h>
 #include <spa/pod/parser.h>
 
+#include "bridges/pipewire/graph/PodCheck.h"
+
 namespace tonewerk {
 
 namespace {
@@ -116,7 +118,7 @@ std::optional<ProfiledCycle> cycleOf(const spa_pod_object& object) {
 
 std::vector<ProfiledCycle> cyclesOf(const spa_pod& profile) {
   std::vector<ProfiledCycle> cycles;
-  if (!spa_pod_is_struct(&profile)) return cycles;
+  if (!spa_pod_is_struct(&profile) || !isWellFormed(profile)) return cycles;
   const void* body = SPA_POD_BODY_CONST(&profile);
   for (auto* pod = static_cast<const spa_pod*>(body); spa_pod_is_inside(body, profile.size, pod);
        pod = static_cast<const spa_pod*>(spa_pod_next(pod))) {

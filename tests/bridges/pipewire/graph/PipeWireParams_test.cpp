@@ -129,5 +129,25 @@ TEST(PipeWireParams, ReadsAtMostTheMaximumOfChannels) {
   EXPECT_LE(volumeOf(maker.close()).channels.size(), 64U);
 }
 
+// PipeWire's function for reading arrays copies as many bytes as the array claims for an element. Any client
+// could write behind the array on the bridge's stack.
+TEST(PipeWireParams, LeavesOutVolumesThatClaimToBeLargerThanANumber) {
+  PodMaker maker;
+  maker.open(SPA_TYPE_OBJECT_Props, SPA_PARAM_Props);
+  const std::array<std::uint8_t, 3000> channels{};
+  spa_pod_builder_array(maker.property(SPA_PROP_channelVolumes), 1000, SPA_TYPE_Float, 3, channels.data());
+  EXPECT_THAT(volumeOf(maker.close()).channels, IsEmpty());
+}
+
+// The value would be read from what follows the choice.
+TEST(PipeWireParams, RefusesAFormatWhoseRateIsAChoiceWithoutAValue) {
+  FormatMaker maker(SPA_MEDIA_TYPE_audio, SPA_MEDIA_SUBTYPE_raw);
+  const spa_pod_choice choice{{sizeof(spa_pod_choice_body), SPA_TYPE_Choice},
+                              {SPA_CHOICE_None, 0, {sizeof(std::int32_t), SPA_TYPE_Int}}};
+  spa_pod_builder_primitive(maker.property(SPA_FORMAT_AUDIO_rate), &choice.pod);
+  maker.channels(2);
+  EXPECT_EQ(formatOf(maker.close()), std::nullopt);
+}
+
 }  // namespace
 }  // namespace tonewerk
