@@ -21,7 +21,8 @@ bool readStat(std::string_view text, ProcessRow& row) {
   const std::optional<ProcessStat> stat = ProcessStat::parse(text);
   if (!stat) return false;
   row.name = validUtf8(std::string(stat->name));  // the kernel cut it to 15 bytes
-  row.state = stat->fields[ProcessStat::kState].front();
+  const char state = stat->fields[ProcessStat::kState].front();
+  row.state = state > ' ' && state <= '~' ? state : '?';
   row.parent = numberIn<std::int32_t>(stat->fields[ProcessStat::kParent]);
   row.threads = numberIn<std::int64_t>(stat->fields[ProcessStat::kThreads]);
   const auto ticks = numberIn<std::uint64_t>(stat->fields[ProcessStat::kUserTicks]) +

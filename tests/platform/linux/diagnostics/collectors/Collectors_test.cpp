@@ -69,6 +69,12 @@ TEST_F(CollectorsTest, AProcessNameThatIsCutInACharacterIsStillText) {
   EXPECT_EQ(readProcessTable(directory.path()).at(0).name, "lecteur-musiqu\uFFFD");
 }
 
+TEST_F(CollectorsTest, AStateThatIsNoLetterKeepsTheTextAText) {
+  putProcess(20, "player", 0, "");
+  put("20/stat", "20 (player) \xC3 1 1 1 0 -1 0 0 0 0 0 0 0 0 0 20 0 3 0 100 0 0");
+  EXPECT_EQ(readProcessTable(directory.path()).at(0).state, '?');
+}
+
 TEST_F(CollectorsTest, ReadsTheKernelsProcessTable) {
   const std::vector<ProcessRow> rows = readProcessTable();
   const auto own = std::find_if(rows.begin(), rows.end(),
