@@ -11,6 +11,23 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
+// No item holds values that nest deeper. The library writes values recursively, so a text that is deep enough
+// would exhaust the stack.
+constexpr int kMaxDepth = 200;
+
+// Discarded when `text` is not JSON, or nests deeper than kMaxDepth.
+Json parsed(std::string_view text) {
+  bool isTooDeep = false;
+  const auto take = [&](int levelsAround, Json::parse_event_t event, Json& /*value*/) {
+    const bool isStart =
+        event == Json::parse_event_t::object_start || event == Json::parse_event_t::array_start;
+    isTooDeep = isTooDeep || (isStart && levelsAround >= kMaxDepth);
+    return !isTooDeep;
+  };
+  Json json = Json::parse(text, take, false);
+  return isTooDeep ? Json(Json::value_t::discarded) : json;
+}
+
 // Null when a key of the path is missing.
 const Json* find(const Json& root, std::initializer_list<const char*> path) {
   const Json* at = &root;
@@ -71,7 +88,7 @@ void readWhirlcap(const Json& request, DiagnosticSummary& summary) {
 }  // namespace
 
 std::optional<DiagnosticSummary> DiagnosticSummary::read(DiagnosticKind kind, std::string_view text) {
-  const Json request = Json::parse(text, nullptr, false);
+  const Json request = parsed(text);
   if (!request.is_object()) return std::nullopt;
   DiagnosticSummary summary;
   switch (kind) {
@@ -96,7 +113,7 @@ std::optional<DiagnosticSummary> DiagnosticSummary::read(DiagnosticKind kind, st
 }
 
 std::string compactJson(std::string_view text) {
-  const Json value = Json::parse(text, nullptr, false);
+  const Json value = parsed(text);
   return value.is_discarded() ? "null" : value.dump(-1, ' ', false, Json::error_handler_t::replace);
 }
 

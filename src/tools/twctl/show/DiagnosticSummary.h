@@ -23,11 +23,11 @@ struct DiagnosticSummary {
   std::string payload;                                        // compact JSON
   std::vector<std::pair<std::string, std::string>> problems;  // by file
 
-  // None when `text` is not a JSON object.
+  // None when `text` is not a JSON object, or nests deeper than any item does (200 levels).
   [[nodiscard]] static std::optional<DiagnosticSummary> read(DiagnosticKind kind, std::string_view text);
 };
 
-// `text` as one line of JSON; "null" when it is not JSON.
+// `text` as one line of JSON; "null" when it is not JSON, or nests as deep.
 std::string compactJson(std::string_view text);
 
 }  // namespace tonewerk
