@@ -2,7 +2,9 @@
 #include "platform/linux/json/JsonBenchfile.h"
 
 #include <cerrno>
+#include <cstdio>
 #include <fcntl.h>
+#include <sys/stat.h>
 #include <thread>
 #include <unistd.h>
 #include <utility>
@@ -17,16 +19,18 @@
 namespace tonewerk {
 namespace {
 
+constexpr const char* kNewSuffix = ".new";
 constexpr std::size_t kBufferBytes = std::size_t{64} << 10;
 
 class JsonBenchfileWriter final : public BenchfileWriter {
  public:
+  // `file` is what is at the path with kNewSuffix.
   JsonBenchfileWriter(std::string path, FileDescriptor file)
-      : path_(std::move(path)), file_(std::move(file)) {}
+      : path_(std::move(path)), newPath_(path_ + kNewSuffix), file_(std::move(file)) {}
   JsonBenchfileWriter(const JsonBenchfileWriter&) = delete;
   JsonBenchfileWriter& operator=(const JsonBenchfileWriter&) = delete;
   ~JsonBenchfileWriter() override {
-    if (file_) ::unlink(path_.c_str());
+    if (file_) ::unlink(newPath_.c_str());
   }
 
   void begin(const ValueMap& context) {
@@ -53,6 +57,9 @@ class JsonBenchfileWriter final : public BenchfileWriter {
   std::error_code close() override {
     buffer_ += "\n]}\n";
     flush();
+    if (!error_ && (fsync(file_.get()) != 0 || ::rename(newPath_.c_str(), path_.c_str()) != 0)) {
+      error_ = lastSystemError();
+    }
     if (error_) return error_;  // the destructor removes the file
     const FileDescriptor file = std::move(file_);
     return {};
@@ -65,6 +72,7 @@ class JsonBenchfileWriter final : public BenchfileWriter {
   }
 
   const std::string path_;
+  const std::string newPath_;
   FileDescriptor file_;  // none after close() succeeded
   std::string buffer_;
   std::error_code error_;  // the first one
@@ -81,9 +89,15 @@ std::string hostName() {
 std::unique_ptr<BenchfileWriter> JsonBenchfile::open(const std::string& path, std::string_view dataName,
                                                      int resultsVersion, int& systemError) {
   systemError = 0;
-  // If this fails, open() fails too and reports the error.
+  const std::string newPath = path + kNewSuffix;
   static_cast<void>(::unlink(path.c_str()));
-  FileDescriptor file(::open(path.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0644));
+  static_cast<void>(::unlink(newPath.c_str()));  // if this fails, open() fails too and reports the error
+  struct stat status {};
+  if (::lstat(path.c_str(), &status) == 0) {
+    systemError = EEXIST;
+    return nullptr;
+  }
+  FileDescriptor file(::open(newPath.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0644));
   if (!file) {
     systemError = errno;
     return nullptr;

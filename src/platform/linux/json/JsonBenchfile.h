@@ -11,7 +11,9 @@ class Clock;
 // the name and the version of the data, and "benchmarks" with one entry per value and line. Those tools
 // require processor times, which a trace does not have; so "cpu_time" repeats "real_time".
 //
-// open() first removes any file at the path. So it always creates a new file and follows no link.
+// The file is written under the path with ".new", and gets its name when it is complete and on the disk.
+// open() first removes what is at both paths, so it follows no link, and an earlier file is not taken for the
+// new one.
 class JsonBenchfile final : public Benchfile {
  public:
   // `clock` must outlive this object.
