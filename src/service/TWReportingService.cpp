@@ -34,6 +34,7 @@ constexpr std::chrono::milliseconds kReaperInterval{500};
 const auto category = &TWReportingServiceDelegateCategory;
 
 double now() { return TWReportingContext::current().platform().clock.now(); }
+std::chrono::nanoseconds monotonic() { return TWReportingContext::current().platform().clock.monotonic(); }
 
 }  // namespace
 
@@ -202,7 +203,7 @@ TWReportingService::Session TWReportingService::singleMessageSession(const std::
           if (const auto service = self.lock()) service->_reapSingleMessageSession();
         });
   }
-  single.lastRetrieved = now();
+  single.lastRetrieved = monotonic();
   return single.session;
 }
 
@@ -232,7 +233,7 @@ TWReportingService::Session TWReportingService::makeSingleMessageSession(
 void TWReportingService::_reapSingleMessageSession() {
   const MutexLock lock(singleMessageMutex_);
   for (auto at = singleMessages_.begin(); at != singleMessages_.end();) {
-    const double elapsed = now() - at->second.lastRetrieved;
+    const double elapsed = std::chrono::duration<double>(monotonic() - at->second.lastRetrieved).count();
     if (!(kSingleMessageSessionTimeoutSeconds < elapsed)) {
       debugLog(category(), "Not stopping singleMessageSession. elapsed=%f timeout=%f", elapsed,
                kSingleMessageSessionTimeoutSeconds);

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <atomic>
+#include <chrono>
 #include <cstdint>
 #include <functional>
 #include <map>
@@ -82,7 +83,7 @@ class TWReportingService final : public MessagingListenerDelegate,
   struct SingleMessage {
     std::shared_ptr<Account> account;
     Session session;
-    double lastRetrieved = 0;  // in seconds since 1970
+    std::chrono::nanoseconds lastRetrieved{0};  // in monotonic time, because the wall clock can jump
   };
   mutable Mutex singleMessageMutex_;
   // By user. A user has none while its messages go to other sessions.

@@ -313,6 +313,18 @@ TEST_F(TWReportingServiceTest, MessagesKeepTheSingleMessageSessionAliveUntilFive
   EXPECT_NE(service->findReportingSessionsForIDs(kNoIDs, owner()).at(0), first);
 }
 
+TEST_F(TWReportingServiceTest, AJumpOfTheWallClockNeitherEndsTheSingleMessageSessionNorKeepsIt) {
+  const auto single = service->findReportingSessionsForIDs(kNoIDs, owner()).at(0);
+  test.clock.setNow(test.clock.now() + 3600.0);
+  test.clock.advance(4.0);
+  run();
+  EXPECT_TRUE(single->started());
+  test.clock.setNow(test.clock.now() - 7200.0);
+  test.clock.advance(1.5);
+  run();
+  EXPECT_FALSE(single->started());
+}
+
 TEST_F(TWReportingServiceTest, TheReaperLogsWhyItWaits) {
   identifiersFoundFor(kNoIDs);
   test.clock.advance(0.5);
@@ -324,6 +336,15 @@ TEST_F(TWReportingServiceTest, TheReaperQueuesTheStopOfTheSession) {
   const auto single = service->findReportingSessionsForIDs(kNoIDs, owner()).at(0);
   test.clock.advance(6.0);
   EXPECT_TRUE(single->started());  // taken out, not yet stopped
+  run();
+  EXPECT_FALSE(single->started());
+}
+
+// The session was kept until the clock showed that time again.
+TEST_F(TWReportingServiceTest, TheReaperStopsTheSessionAlsoWhenTheWallClockWasSetBack) {
+  const auto single = service->findReportingSessionsForIDs(kNoIDs, owner()).at(0);
+  test.clock.setNow(test.clock.now() - 86'400.0);
+  test.clock.advance(6.0);
   run();
   EXPECT_FALSE(single->started());
 }
