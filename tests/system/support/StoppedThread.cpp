@@ -57,7 +57,10 @@ StoppedThread::StoppedThread(pid_t process, const std::string& name, WaitsIn wai
 }
 
 StoppedThread::~StoppedThread() {
-  if (thread_ > 0) ptrace(PTRACE_DETACH, thread_, nullptr, nullptr);
+  // A thread that has ended with its process waits to be reaped by us, and the process waits for that.
+  if (thread_ > 0 && ptrace(PTRACE_DETACH, thread_, nullptr, nullptr) != 0) {
+    waitpid(thread_, nullptr, __WALL);
+  }
 }
 
 }  // namespace tonewerk
