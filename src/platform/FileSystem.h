@@ -1,10 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <cstdint>
 #include <memory>
 #include <string>
 #include <string_view>
 #include <system_error>
+#include <vector>
 
 namespace tonewerk {
 
@@ -28,7 +30,14 @@ class NewFile {
   [[nodiscard]] virtual std::error_code place(const std::string& name) = 0;
 };
 
-// Reads, makes and moves files and directories. Any thread.
+// A regular file of a directory.
+struct FileEntry {
+  std::string name;
+  std::uint64_t bytes = 0;
+  double modifiedAt = 0.0;  // in seconds since 1970
+};
+
+// Reads, makes, moves and removes files and directories. Any thread.
 class FileSystem {
  public:
   virtual ~FileSystem() = default;
@@ -55,6 +64,18 @@ class FileSystem {
   // directly in `directory` (see createFile()).
   [[nodiscard]] virtual std::error_code moveFile(const std::string& from, const std::string& directory,
                                                  const std::string& name) = 0;
+
+  // The regular files directly in `directory`, in no order. Files that are being written are none. What was
+  // read before an error is returned with it.
+  [[nodiscard]] virtual std::vector<FileEntry> listFiles(const std::string& directory,
+                                                         std::error_code& error) const = 0;
+
+  // Removes a regular file or a symbolic link.
+  [[nodiscard]] virtual std::error_code removeFile(const std::string& path) = 0;
+
+  // Removes what processes that were killed left in `directory` of their new files. Not necessary before
+  // createFile().
+  virtual void removeLeftovers(const std::string& directory) = 0;
 };
 
 }  // namespace tonewerk

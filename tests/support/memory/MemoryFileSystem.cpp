@@ -47,6 +47,7 @@ class MemoryFileSystem::File final : public NewFile {
     const std::string path = directory_ + "/" + name;
     if (state_->holds(path)) return std::make_error_code(std::errc::file_exists);
     state_->files[path] = std::move(text_);
+    state_->times[path] = state_->placed++;
     isPlaced_ = true;
     --state_->openFiles;
     return {};
@@ -128,6 +129,37 @@ std::error_code MemoryFileSystem::moveFile(const std::string& from, const std::s
   return {};
 }
 
+std::vector<FileEntry> MemoryFileSystem::listFiles(const std::string& directory,
+                                                   std::error_code& error) const {
+  const MutexLock lock(state_->mutex);
+  error.clear();
+  if (!state_->directories.contains(directory)) {
+    error = std::make_error_code(std::errc::no_such_file_or_directory);
+  }
+  std::vector<FileEntry> entries;
+  for (const auto& [path, text] : state_->files) {
+    const std::size_t slash = path.rfind('/');
+    if (path.substr(0, slash) != directory) continue;
+    const auto time = state_->times.find(path);
+    entries.push_back(
+        {path.substr(slash + 1), text.size(), time == state_->times.end() ? 0.0 : time->second});
+  }
+  return entries;
+}
+
+std::error_code MemoryFileSystem::removeFile(const std::string& path) {
+  const MutexLock lock(state_->mutex);
+  if (state_->removeFailure != std::errc()) return std::make_error_code(state_->removeFailure);
+  if (state_->directories.contains(path)) return std::make_error_code(std::errc::is_a_directory);
+  if (state_->files.erase(path) + state_->links.erase(path) > 0) return {};
+  return std::make_error_code(std::errc::no_such_file_or_directory);
+}
+
+void MemoryFileSystem::removeLeftovers(const std::string& directory) {
+  const MutexLock lock(state_->mutex);
+  state_->swept.push_back(directory);
+}
+
 void MemoryFileSystem::failCreateDirectories(std::errc error) {
   const MutexLock lock(state_->mutex);
   state_->createDirectoriesFailure = error;
@@ -159,9 +191,15 @@ void MemoryFileSystem::failMoveFile(std::errc error) {
   state_->moveFailure = error;
 }
 
-void MemoryFileSystem::addFile(const std::string& path, std::string text) {
+void MemoryFileSystem::failRemoveFile(std::errc error) {
+  const MutexLock lock(state_->mutex);
+  state_->removeFailure = error;
+}
+
+void MemoryFileSystem::addFile(const std::string& path, std::string text, double modifiedAt) {
   static_cast<void>(createDirectories(path.substr(0, path.rfind('/')), 0755));
   const MutexLock lock(state_->mutex);
+  state_->times[path] = modifiedAt;
   state_->files[path] = std::move(text);
 }
 
@@ -187,6 +225,11 @@ std::optional<unsigned> MemoryFileSystem::directoryMode(const std::string& path)
   const MutexLock lock(state_->mutex);
   const auto found = state_->directories.find(path);
   return found == state_->directories.end() ? std::nullopt : std::optional(found->second);
+}
+
+std::vector<std::string> MemoryFileSystem::swept() const {
+  const MutexLock lock(state_->mutex);
+  return state_->swept;
 }
 
 int MemoryFileSystem::openFiles() const {

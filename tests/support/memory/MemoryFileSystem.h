@@ -32,6 +32,11 @@ class MemoryFileSystem final : public FileSystem {
   [[nodiscard]] std::error_code readFile(const std::string& path, std::string& text) const override;
   [[nodiscard]] std::error_code moveFile(const std::string& from, const std::string& directory,
                                          const std::string& name) override;
+  // A new file's time is the number of files that were written before it.
+  [[nodiscard]] std::vector<FileEntry> listFiles(const std::string& directory,
+                                                 std::error_code& error) const override;
+  [[nodiscard]] std::error_code removeFile(const std::string& path) override;
+  void removeLeftovers(const std::string& directory) override;
 
   // From now on the call fails with `error`; std::errc() makes it succeed again.
   void failCreateDirectories(std::errc error);
@@ -43,8 +48,9 @@ class MemoryFileSystem final : public FileSystem {
   void failPlace(std::errc error);
   void failReadFile(std::errc error);
   void failMoveFile(std::errc error);
-  // Adds a file with this text, and its directories.
-  void addFile(const std::string& path, std::string text);
+  void failRemoveFile(std::errc error);
+  // Adds a file with this text, and its directories. `modifiedAt` in seconds since 1970.
+  void addFile(const std::string& path, std::string text, double modifiedAt = 0.0);
   void addSymbolicLink(const std::string& path);
 
   // Returns none when there is no such file. A new file has no contents before it is placed.
@@ -52,6 +58,8 @@ class MemoryFileSystem final : public FileSystem {
   std::vector<std::string> files() const;
   // Returns the mode with which the directory was made; none when there is no such directory.
   std::optional<unsigned> directoryMode(const std::string& path) const;
+  // Returns the directories whose leftovers were removed.
+  std::vector<std::string> swept() const;
   // Returns how many new files have been neither placed nor destroyed.
   int openFiles() const;
 
@@ -68,6 +76,10 @@ class MemoryFileSystem final : public FileSystem {
     std::errc placeFailure GUARDED_BY(mutex){};
     std::errc readFailure GUARDED_BY(mutex){};
     std::errc moveFailure GUARDED_BY(mutex){};
+    std::errc removeFailure GUARDED_BY(mutex){};
+    std::map<std::string, double> times GUARDED_BY(mutex);
+    std::vector<std::string> swept GUARDED_BY(mutex);
+    int placed GUARDED_BY(mutex) = 0;
     int openFiles GUARDED_BY(mutex) = 0;
 
     // Returns whether `path` exists.

@@ -258,6 +258,41 @@ void LinuxFileSystem::removeLeftovers(const std::string& path, int directory) {
   }
 }
 
+void LinuxFileSystem::removeLeftovers(const std::string& directory) {
+  const FileDescriptor opened(open(directory.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  if (opened) removeLeftovers(directory, opened.get());
+}
+
+std::vector<FileEntry> LinuxFileSystem::listFiles(const std::string& directory,
+                                                  std::error_code& error) const {
+  std::vector<FileEntry> files;
+  error.clear();
+  const FileDescriptor opened(open(directory.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  if (!opened) {
+    error = lastSystemError();
+    return files;
+  }
+  for (std::filesystem::directory_iterator at(directory, error), end; !error && at != end;
+       at.increment(error)) {
+    std::string name = at->path().filename().string();
+    struct stat status {};
+    // A file may be gone by now.
+    if (name.starts_with(kHiddenPrefix) ||
+        fstatat(opened.get(), name.c_str(), &status, AT_SYMLINK_NOFOLLOW) != 0 || !S_ISREG(status.st_mode)) {
+      continue;
+    }
+    files.push_back(
+        {std::move(name), static_cast<std::uint64_t>(status.st_size),
+         static_cast<double>(status.st_mtim.tv_sec) + static_cast<double>(status.st_mtim.tv_nsec) * 1e-9});
+  }
+  return files;
+}
+
+std::error_code LinuxFileSystem::removeFile(const std::string& path) {
+  if (path.find('\0') != std::string::npos) return std::make_error_code(std::errc::invalid_argument);
+  return unlink(path.c_str()) == 0 ? std::error_code() : lastSystemError();
+}
+
 bool LinuxFileSystem::exists(const std::string& path) const {
   struct stat status {};
   return path.find('\0') == std::string::npos && stat(path.c_str(), &status) == 0;

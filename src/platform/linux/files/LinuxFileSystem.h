@@ -3,6 +3,8 @@
 
 #include <set>
 #include <string>
+#include <system_error>
+#include <vector>
 
 #include "platform/FileSystem.h"
 #include "values/Mutex.h"
@@ -32,6 +34,11 @@ class LinuxFileSystem final : public FileSystem {
   // fails.
   [[nodiscard]] std::error_code moveFile(const std::string& from, const std::string& directory,
                                          const std::string& name) override;
+  [[nodiscard]] std::vector<FileEntry> listFiles(const std::string& directory,
+                                                 std::error_code& error) const override;
+  [[nodiscard]] std::error_code removeFile(const std::string& path) override;
+  // Does nothing when this object has done it before.
+  void removeLeftovers(const std::string& directory) override;
 
  private:
   // Does nothing when the directory was cleaned before.

@@ -82,6 +82,36 @@ class FileSystemContract : public testing::Test {
 using Kinds = testing::Types<OnDisk, InMemory>;
 TYPED_TEST_SUITE(FileSystemContract, Kinds);
 
+TYPED_TEST(FileSystemContract, ListsTheFilesOfADirectory) {
+  this->add("a.json", "123");
+  this->add("b.json", "");
+  const auto unfinished = this->create("c.json");
+  std::vector<std::string> listed;
+  for (const FileEntry& file : this->kind_.files.listFiles(this->path("d"), this->error_)) {
+    listed.push_back(file.name + " " + std::to_string(file.bytes));
+    EXPECT_GE(file.modifiedAt, 0.0);
+  }
+  EXPECT_FALSE(this->error_);
+  EXPECT_THAT(listed, testing::UnorderedElementsAre("a.json 3", "b.json 0"));
+}
+
+TYPED_TEST(FileSystemContract, CannotListADirectoryThatIsMissing) {
+  EXPECT_THAT(this->kind_.files.listFiles(this->path("missing"), this->error_), IsEmpty());
+  EXPECT_EQ(this->error_, std::errc::no_such_file_or_directory);
+}
+
+TYPED_TEST(FileSystemContract, RemovesAFile) {
+  this->add("a.json", "123");
+  EXPECT_FALSE(this->kind_.files.removeFile(this->path("d/a.json")));
+  EXPECT_FALSE(this->kind_.files.exists(this->path("d/a.json")));
+  EXPECT_EQ(this->kind_.files.removeFile(this->path("d/a.json")), std::errc::no_such_file_or_directory);
+}
+
+TYPED_TEST(FileSystemContract, DoesNotRemoveADirectory) {
+  EXPECT_EQ(this->kind_.files.removeFile(this->path("d")), std::errc::is_a_directory);
+  EXPECT_TRUE(this->kind_.files.exists(this->path("d")));
+}
+
 TYPED_TEST(FileSystemContract, AFileIsThereWhenItIsPlacedAndNotBefore) {
   const auto file = this->create("name.json");
   ASSERT_NE(file, nullptr);
