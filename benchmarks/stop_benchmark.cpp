@@ -295,9 +295,11 @@ void WriteFile(benchmark::State& state) {
     SummaryJsonFile file(core.directory(), "stop.json");
     for (const auto& message : messages)
       file.writeMessage(message->category, message->type, message->message);
-    file.closeFile();
+    const bool isWritten = file.closeFile();
     state.PauseTiming();
-    if (!std::filesystem::remove(core.directory() + "/stop.json")) state.SkipWithError("no file was written");
+    if (!isWritten || !std::filesystem::remove(core.directory() + "/stop.json")) {
+      state.SkipWithError("no file was written");
+    }
     state.ResumeTiming();
   }
   reportTimeOfAMessage(state);

@@ -44,8 +44,9 @@ struct StrandPool::Shared {
   }
 };
 
-StrandPool::StrandPool(std::unique_ptr<SerialQueue> thread)
-    : shared_(std::make_shared<Shared>()), thread_(std::make_unique<SinkQueue>(std::move(thread))) {
+StrandPool::StrandPool(std::unique_ptr<SerialQueue> thread, std::string name, const LogCategory& log)
+    : shared_(std::make_shared<Shared>()),
+      thread_(std::make_unique<SinkQueue>(std::move(thread), std::move(name), log)) {
   const MutexLock lock(shared_->mutex);
   shared_->thread = thread_.get();
 }
@@ -75,6 +76,15 @@ std::shared_ptr<Strand> StrandPool::makeStrand() { return std::make_shared<Stran
 
 void StrandPool::drain() { thread_->drain(); }
 
+bool StrandPool::drain(std::chrono::milliseconds timeout) { return thread_->drain(timeout); }
+
+SinkStatus StrandPool::status() const {
+  SinkStatus status = thread_->status();
+  status.waiting += heldCount();
+  status.dropped += droppedCount();
+  return status;
+}
+
 std::uint64_t StrandPool::droppedCount() const {
   const MutexLock lock(shared_->mutex);
   return shared_->droppedCount;
@@ -89,7 +99,7 @@ Strand::Strand(std::shared_ptr<StrandPool::Shared> shared) : shared_(std::move(s
 
 Strand::~Strand() { takeHeld(); }
 
-void Strand::submit(std::size_t bytes, Task work) {
+bool Strand::submit(std::size_t bytes, Task work) {
   waitingCount_.fetch_add(1, std::memory_order_relaxed);
   SinkQueue* thread = nullptr;
   {
@@ -97,9 +107,12 @@ void Strand::submit(std::size_t bytes, Task work) {
     thread = shared_->thread;
   }
   assert(thread != nullptr);
-  thread->submit(bytes + kPieceBytes, [self = shared_from_this(), bytes, held = std::move(work)]() mutable {
-    self->runOrHold(bytes, std::move(held));
-  });
+  const bool isTaken = thread->submit(bytes + kPieceBytes,
+                                      [self = shared_from_this(), bytes, held = std::move(work)]() mutable {
+                                        self->runOrHold(bytes, std::move(held));
+                                      });
+  if (!isTaken) waitingCount_.fetch_sub(1, std::memory_order_release);
+  return isTaken;
 }
 
 void Strand::interrupt(Task work) {

@@ -2,17 +2,21 @@
 #pragma once
 
 #include <atomic>
+#include <chrono>
 #include <cstddef>
 #include <cstdint>
 #include <deque>
 #include <memory>
+#include <string>
 #include <thread>
 
 #include "platform/SerialQueue.h"
+#include "platform/SinkStatus.h"
 #include "values/Mutex.h"
 
 namespace tonewerk {
 
+class LogCategory;
 class Strand;
 class SinkQueue;
 
@@ -23,14 +27,15 @@ class SinkQueue;
 //                                            -> held behind a piece that waits, 8 MiB -> runs when released
 //                                                                                     -> dropped and counted
 //
-// submit() waits while the thread's queue is full, because the thread works on it. It never waits for held
-// pieces, which may wait for seconds.
+// submit() waits while the thread's queue is full, because the thread works on it, but not for a thread that
+// hangs (SinkQueue.h). It never waits for held pieces, which may wait for seconds.
 class StrandPool {
  public:
   // The bytes that all strands together may hold back.
   static constexpr std::size_t kMaxHeldBytes = std::size_t{8} << 20;
 
-  explicit StrandPool(std::unique_ptr<SerialQueue> thread);
+  // `name` is that of the status. `log` outlives the pool.
+  StrandPool(std::unique_ptr<SerialQueue> thread, std::string name, const LogCategory& log);
   StrandPool(const StrandPool&) = delete;
   StrandPool& operator=(const StrandPool&) = delete;
   // Runs the pieces that are not held and drops the held ones. Strands may outlive the pool; interrupt() then
@@ -42,6 +47,11 @@ class StrandPool {
 
   // Returns when every piece submitted before has run or is held.
   void drain();
+  // The same, but returns false after `timeout`.
+  [[nodiscard]] bool drain(std::chrono::milliseconds timeout);
+
+  // Any thread. The pieces of all strands.
+  SinkStatus status() const;
 
   // How many pieces have been dropped so far, and how many are held now.
   std::uint64_t droppedCount() const;
@@ -65,8 +75,9 @@ class Strand : public std::enable_shared_from_this<Strand> {
   ~Strand();
 
   // Queues `work`, which holds `bytes`. Any thread but the pool's own, while the pool lives; only one serial
-  // queue when runAtOnce() is used, too. Pieces run in the order of their submission.
-  void submit(std::size_t bytes, Task work);
+  // queue when runAtOnce() is used, too. Pieces run in the order of their submission. A piece for which the
+  // thread's queue has no room is dropped, counted and logged there; the result is then false.
+  bool submit(std::size_t bytes, Task work);
 
   // Runs `work` on the calling thread when no piece waits before it. Returns false, without running it, when
   // one does, or when a piece is running: submit() then keeps the order. `work` must not hold(). One serial

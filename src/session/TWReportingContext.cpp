@@ -94,7 +94,9 @@ void TWReportingContext::endReportingServerQueue() {
 SinkQueue& TWReportingContext::fileSinkQueue() {
   std::call_once(fileSinkQueueOnce_, [this] {
     fileSinkQueue_ = std::make_unique<SinkQueue>(
-        platform_.queues.makeSerialQueue("com.orvane.tonewerk.reporting.files", QueuePriority::kUtility));
+        platform_.queues.makeSerialQueue("com.orvane.tonewerk.reporting.files", QueuePriority::kUtility),
+        "jsonFiles", logCategories.summary);
+    sinks_.add([this] { return fileSinkQueue_->status(); });
   });
   return *fileSinkQueue_;
 }
@@ -102,7 +104,9 @@ SinkQueue& TWReportingContext::fileSinkQueue() {
 StrandPool& TWReportingContext::linkReportQueues() {
   std::call_once(linkReportQueuesOnce_, [this] {
     linkReportQueues_ = std::make_unique<StrandPool>(
-        platform_.queues.makeSerialQueue("com.orvane.tonewerk.session.linkreport", QueuePriority::kUtility));
+        platform_.queues.makeSerialQueue("com.orvane.tonewerk.session.linkreport", QueuePriority::kUtility),
+        "linkReport", logCategories.linkReport);
+    sinks_.add([this] { return linkReportQueues_->status(); });
   });
   return *linkReportQueues_;
 }

@@ -13,6 +13,7 @@
 #include "platform/Log.h"
 #include "platform/Platform.h"
 #include "platform/SerialQueue.h"
+#include "platform/SinkStatus.h"
 #include "protocol/AudioEvent.h"
 #include "session/SingletonRegistry.h"
 #include "session/SinkQueue.h"
@@ -66,6 +67,9 @@ class TWReportingContext {
   // use.
   StrandPool& linkReportQueues();
 
+  // The sinks whose state people may ask for. The context adds its own queues when it makes them.
+  SinkList& sinks() { return sinks_; }
+
   // Whether the device says that this is an internal build. Asks it once.
   bool isInternalBuild();
 
@@ -106,6 +110,7 @@ class TWReportingContext {
   const Platform platform_;
   TWReportingNameTable names_;
   SingletonRegistry singletons_;
+  SinkList sinks_;
 
   std::once_flag internalBuildOnce_;
   bool isInternalBuild_ = false;

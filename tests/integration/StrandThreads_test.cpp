@@ -6,12 +6,15 @@
 
 #include "platform/linux/threads/ThreadQueue.h"
 #include "session/StrandPool.h"
+#include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
 namespace {
 
 TEST(StrandThreadsTest, NoTwoPiecesRunAtTheSameTime) {
-  StrandPool pool(std::make_unique<ThreadQueue>("strands", QueuePriority::kUtility));
+  MemoryLog lines;
+  const LogCategory log(lines, "com.orvane.tonewerk", "twri");
+  StrandPool pool(std::make_unique<ThreadQueue>("strands", QueuePriority::kUtility), "linkReport", log);
   const auto strand = pool.makeStrand();
   int count = 0;  // guarded by the strand alone
   std::size_t runAtOnce = 0;

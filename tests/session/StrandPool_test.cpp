@@ -7,6 +7,7 @@
 #include <thread>
 
 #include "support/manual/ManualSerialQueue.h"
+#include "support/memory/MemoryLog.h"
 
 namespace tonewerk {
 namespace {
@@ -18,7 +19,7 @@ class StrandPoolTest : public ::testing::Test {
   StrandPoolTest() {
     auto owned = std::make_unique<ManualSerialQueue>("thread");
     thread = owned.get();
-    pool.emplace(std::move(owned));
+    pool.emplace(std::move(owned), "linkReport", log);
     strand = pool->makeStrand();
   }
 
@@ -29,6 +30,8 @@ class StrandPoolTest : public ::testing::Test {
     to.submit(0, [&to] { to.hold(); });
   }
 
+  MemoryLog lines;
+  const LogCategory log{lines, "com.orvane.tonewerk", "twri"};
   std::string ran;
   ManualSerialQueue* thread = nullptr;
   std::optional<StrandPool> pool;

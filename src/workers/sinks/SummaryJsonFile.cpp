@@ -7,6 +7,7 @@
 #include <limits>
 
 #include "platform/FileSystem.h"
+#include "platform/Heartbeat.h"
 #include "platform/Log.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingUtility.h"
@@ -86,6 +87,7 @@ void SummaryJsonFile::writeCollected() {
   if (lines_.empty()) return;
   writeLine(std::string_view(lines_).substr(0, lines_.size() - 1));
   lines_.clear();
+  Heartbeat::beatHere();
 }
 
 void SummaryJsonFile::writeMessage(AudioEventCategory category, AudioEventType type,
@@ -126,9 +128,10 @@ const SummaryJsonFile::Kind& SummaryJsonFile::kindOf(AudioEventCategory category
   return kind;
 }
 
-void SummaryJsonFile::closeFile() {
+bool SummaryJsonFile::closeFile() {
   writeCollected();
   writeLine("]");
+  const bool isWritten = reportPath_.empty() || reportFileHandle_ != nullptr;
   std::error_code error;
   if (reportFileHandle_ != nullptr) {
     error = withFreeName([this](const std::string& name) { return reportFileHandle_->place(name); });
@@ -144,6 +147,7 @@ void SummaryJsonFile::closeFile() {
   }
   reportFileHandle_.reset();
   reportPath_.clear();
+  return isWritten && !error;
 }
 
 }  // namespace tonewerk

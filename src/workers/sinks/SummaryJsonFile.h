@@ -44,7 +44,8 @@ class SummaryJsonFile {
   void writeMessage(AudioEventCategory category, AudioEventType type, const ValueMap& payload);
 
   // Ends the array and gives the file its name. Without a message it writes nothing, but logs the closing.
-  void closeFile();
+  // False when there were messages and there is no file.
+  [[nodiscard]] bool closeFile();
 
  private:
   struct Kind {

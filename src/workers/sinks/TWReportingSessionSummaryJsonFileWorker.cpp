@@ -30,8 +30,9 @@ struct Entry {
 const ValueMapEntry kStarted{TWReportingMessageKeyIsSessionStarted, "YES"};
 const ValueMapEntry kNotStarted{TWReportingMessageKeyIsSessionStarted, "NO"};
 
-// Frees each payload while its bytes are in the processor's caches, and asks for later ones meanwhile.
-void writeFile(SummaryJsonFile& file, std::vector<Entry>& entries) {
+// Returns whether the file is there. Frees each payload while its bytes are in the caches, and asks for later
+// ones meanwhile.
+bool writeFile(SummaryJsonFile& file, std::vector<Entry>& entries) {
   constexpr std::size_t kAhead = 8;
   constexpr std::size_t kPayloadBytes = 192;
   for (std::size_t at = 0; at < entries.size(); ++at) {
@@ -40,7 +41,7 @@ void writeFile(SummaryJsonFile& file, std::vector<Entry>& entries) {
     file.writeMessage(entry.category, entry.type, entry.payload);
     entry.payload = ValueMap();
   }
-  file.closeFile();
+  return file.closeFile();
 }
 
 }  // namespace
@@ -83,9 +84,14 @@ void TWReportingSessionSummaryJsonFileWorker::stop() {
     bytes += sizeof(Entry) + message.message.bytes();
     entries.push_back({message.category, message.type, message.message});
   });
-  TWReportingContext::current().fileSinkQueue().submit(
-      bytes, [file = std::make_unique<SummaryJsonFile>(TWReportingLogsDirectory(), fileNameFor(*owner)),
-              entries = std::move(entries)]() mutable { writeFile(*file, entries); });
+  SinkQueue& queue = TWReportingContext::current().fileSinkQueue();
+  // The queue counts and logs a file that is dropped because the disk hangs.
+  static_cast<void>(queue.submit(
+      bytes,
+      [&queue, file = std::make_unique<SummaryJsonFile>(TWReportingLogsDirectory(), fileNameFor(*owner)),
+       entries = std::move(entries)]() mutable {
+        if (!writeFile(*file, entries)) queue.countLost();
+      }));
 }
 
 }  // namespace tonewerk

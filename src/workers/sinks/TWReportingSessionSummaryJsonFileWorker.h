@@ -12,7 +12,8 @@ namespace tonewerk {
 // messages that producers made. On internal builds every session gets a file, elsewhere those of the "test"
 // service.
 //
-// The messages are taken on the work queue. The file is written on the file sinks' own queue.
+// The messages are taken on the work queue. The file is written on the file sinks' own queue, which drops it
+// when the disk hangs.
 class TWReportingSessionSummaryJsonFileWorker final : public TWReportingSessionWorkerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;

@@ -29,7 +29,7 @@ class SummaryJsonFileTest : public ReportingTest {
   std::string written(const std::vector<ValueMap>& payloads) {
     SummaryJsonFile file(kDirectory, "a.json");
     for (const ValueMap& payload : payloads) file.writeMessage(kCategorySetup, kTypeStart, payload);
-    file.closeFile();
+    EXPECT_TRUE(file.closeFile());
     return test.files.contents(kPath).value_or("no file");
   }
   // The file's lines. The lines of an entry are shown as the name of its member.
@@ -92,7 +92,7 @@ TEST_F(SummaryJsonFileTest, OnlyTheFirstLineThatCannotBeWrittenIsLogged) {
   file.writeMessage(kCategorySetup, kTypeStart, kGood);
   test.files.failWrite(2, std::errc::no_space_on_device);  // the end of ","
   file.writeMessage(kCategorySetup, kTypeStart, kGood);
-  file.closeFile();
+  EXPECT_FALSE(file.closeFile());
   EXPECT_THAT(test.log.textsOf("twru", LogLevel::kError),
               ElementsAre(StartsWith("SummaryJsonFileWorker failed to write line."),
                           StartsWith("SummaryJsonFileWorker failed to closed file.")));
@@ -141,7 +141,7 @@ TEST_F(SummaryJsonFileTest, ANameThatIsTakenWhileTheFileIsWrittenIsNotReplaced) 
   file.writeMessage(kCategorySetup, kTypeStart, kGood);
   test.files.addFile(kPath, "faster");
   test.files.addFile("/logs/a-2.json", "faster still");
-  file.closeFile();
+  EXPECT_TRUE(file.closeFile());
   EXPECT_EQ(test.files.contents(kPath), "faster");
   EXPECT_EQ(test.files.contents("/logs/a-2.json"), "faster still");
   EXPECT_TRUE(test.files.contents("/logs/a-3.json").has_value());
@@ -155,7 +155,7 @@ TEST_F(SummaryJsonFileTest, ANameThatBecomesTooLongWithItsNumberCannotBeOpenedAn
   test.files.addFile("/logs/" + name, "");
   SummaryJsonFile file(kDirectory, name);
   file.writeMessage(kCategorySetup, kTypeStart, kGood);
-  file.closeFile();
+  EXPECT_FALSE(file.closeFile());
   EXPECT_THAT(test.files.files(), SizeIs(1));
   EXPECT_THAT(test.log.textsOf("twru", LogLevel::kError),
               ElementsAre(StartsWith("SummaryJsonFileWorker failed to open file. action=open file=/logs/" +

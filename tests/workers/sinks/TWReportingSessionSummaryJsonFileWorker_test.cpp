@@ -198,6 +198,15 @@ TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, EachStopWritesAFileOfItsOwn)
   EXPECT_THAT(test.files.files(), SizeIs(2));
 }
 
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, AFileThatCannotBeWrittenIsCountedAsDropped) {
+  session->start();
+  send({{"run", "first"}});
+  test.files.failPlace(std::errc::no_space_on_device);
+  stop();
+  EXPECT_THAT(test.files.files(), IsEmpty());
+  EXPECT_EQ(context->fileSinkQueue().status().dropped, 1U);
+}
+
 // Once, the second file replaced the first.
 TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, StopsWithinOneSecondWriteFilesWithNumbers) {
   for (const char* run : {"first", "second", "third"}) {
