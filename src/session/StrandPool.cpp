@@ -24,9 +24,9 @@ struct StrandPool::Shared {
   std::size_t heldCount GUARDED_BY(mutex) = 0;
   std::uint64_t droppedCount GUARDED_BY(mutex) = 0;
 
-  bool reserve(Strand& strand, std::size_t bytes) {
+  bool reserve(Strand& strand, std::size_t bytes, bool mayDrop) {
     const MutexLock lock(mutex);
-    if (heldBytes + bytes > kMaxHeldBytes) {
+    if (mayDrop && heldBytes + bytes > kMaxHeldBytes) {
       ++droppedCount;
       return false;
     }
@@ -109,10 +109,23 @@ bool Strand::submit(std::size_t bytes, Task work) {
   assert(thread != nullptr);
   const bool isTaken = thread->submit(bytes + kPieceBytes,
                                       [self = shared_from_this(), bytes, held = std::move(work)]() mutable {
-                                        self->runOrHold(bytes, std::move(held));
+                                        self->runOrHold(bytes, std::move(held), true);
                                       });
   if (!isTaken) waitingCount_.fetch_sub(1, std::memory_order_release);
   return isTaken;
+}
+
+void Strand::post(Task work) {
+  waitingCount_.fetch_add(1, std::memory_order_relaxed);
+  SinkQueue* thread = nullptr;
+  {
+    const MutexLock lock(shared_->mutex);
+    thread = shared_->thread;
+  }
+  assert(thread != nullptr);
+  thread->post([self = shared_from_this(), held = std::move(work)]() mutable {
+    self->runOrHold(0, std::move(held), false);
+  });
 }
 
 void Strand::interrupt(Task work) {
@@ -167,11 +180,11 @@ bool Strand::ownsThisThread() const {
   return shared_->thread == nullptr;
 }
 
-void Strand::runOrHold(std::size_t bytes, Task work) {
+void Strand::runOrHold(std::size_t bytes, Task work, bool mayDrop) {
   run([&] {
     if (!isHeld_) {
       work();
-    } else if (shared_->reserve(*this, bytes + kPieceBytes)) {
+    } else if (shared_->reserve(*this, bytes + kPieceBytes, mayDrop)) {
       held_.push_back({bytes + kPieceBytes, std::move(work)});
       return;
     } else {

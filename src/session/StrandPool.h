@@ -27,6 +27,8 @@ class SinkQueue;
 //                                            -> held behind a piece that waits, 8 MiB -> runs when released
 //                                                                                     -> dropped and counted
 //
+// Pieces of post() take the same way, but have room everywhere.
+//
 // submit() waits while the thread's queue is full, because the thread works on it, but not for a thread that
 // hangs (SinkQueue.h). It never waits for held pieces, which may wait for seconds.
 class StrandPool {
@@ -78,6 +80,10 @@ class Strand : public std::enable_shared_from_this<Strand> {
   // queue when runAtOnce() is used, too. Pieces run in the order of their submission. A piece for which the
   // thread's queue has no room is dropped, counted and logged there; the result is then false.
   bool submit(std::size_t bytes, Task work);
+
+  // The same for work that must run: it is never dropped, whether the thread's queue is full or the strand
+  // holds it back, and it does not wait. For work that holds few bytes and is bounded by other means.
+  void post(Task work);
 
   // Runs `work` on the calling thread when no piece waits before it. Returns false, without running it, when
   // one does, or when a piece is running: submit() then keeps the order. `work` must not hold(). One serial
@@ -137,7 +143,7 @@ class Strand : public std::enable_shared_from_this<Strand> {
   bool isRunningHere() const { return runner_.load(std::memory_order_relaxed) == std::this_thread::get_id(); }
   // Runs `work` when no other piece runs. On the pool's thread.
   void run(const Task& work);
-  void runOrHold(std::size_t bytes, Task work);
+  void runOrHold(std::size_t bytes, Task work, bool mayDrop);
   std::deque<Piece> takeHeld();
 
   const std::shared_ptr<StrandPool::Shared> shared_;

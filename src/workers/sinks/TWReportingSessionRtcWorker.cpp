@@ -51,14 +51,16 @@ std::optional<bool> TWReportingSessionRtcWorker::start() {
   start.reporterID = owner->reporterID();
   start.isSingleMessageSession = owner->isSingleMessageSession();
   makeQueueOnFirstUse();
-  ++starts_;
   const std::size_t bytes = sizeof(start) + start.configuration.bytes();
-  linkReportQueue_->submit(bytes, [reporter = reporter_, held = std::move(start)] { reporter->start(held); });
+  isStartDropped_ = !linkReportQueue_->submit(
+      bytes, [reporter = reporter_, held = std::move(start)] { reporter->start(held); });
+  if (!isStartDropped_) ++starts_;
   return true;
 }
 
 bool TWReportingSessionRtcWorker::handleMessage(const TWReportingSessionMessage& message) {
   assert(TWReportingUtilityIsOnReportingServerQueue());
+  if (isStartDropped_) return false;
   makeQueueOnFirstUse();
   if (reporter_->isQuick() && linkReportQueue_->runAtOnce([&] { reporter_->handleMessage(message); })) {
     return false;
@@ -73,7 +75,7 @@ bool TWReportingSessionRtcWorker::handleMessage(const TWReportingSessionMessage&
 void TWReportingSessionRtcWorker::stop() {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto owner = session.lock();
-  if (owner == nullptr) return;
+  if (owner == nullptr || std::exchange(isStartDropped_, false)) return;
   makeQueueOnFirstUse();
   // Without backends there is no summary, and so nothing to copy; only a debug line says that a message is.
   const bool needsCopies =
@@ -86,11 +88,12 @@ void TWReportingSessionRtcWorker::stop() {
     copies.push_back(message->copyWithZone());
     bytes += sizeof(TWReportingSessionMessage) + message->message.bytes();
   }
-  // These are two pieces, so that when there is no room for the summary, the session is still ended.
+  // Without room for the summary it is dropped, but the session is ended in any case: it would stay open, and
+  // the next start would find it. There is one such piece for each start that was taken.
   linkReportQueue_->submit(
       bytes, [reporter = reporter_, held = std::move(copies), serviceType = owner->serviceType(),
               reporterID = owner->reporterID()] { reporter->sendSummary(held, serviceType, reporterID); });
-  linkReportQueue_->submit(0, [reporter = reporter_] { reporter->stop(); });
+  linkReportQueue_->post([reporter = reporter_] { reporter->stop(); });
 }
 
 }  // namespace tonewerk

@@ -19,6 +19,8 @@ class RtcReporter;
 // service's backends, and messages and the stop wait behind it. A message that nothing is ahead of has its
 // turn on the strand at once, on the work queue's thread, when the service only hands it to the store:
 // changing threads would cost more than that. Messages for a network go to the other thread.
+// When the thread hangs and a start does not fit, nothing of the session until its stop is sent. A stop is
+// never dropped.
 // `started` belongs to the session; the backends' answer does not change it.
 class TWReportingSessionRtcWorker final : public TWReportingSessionWorkerConsumerProtocol {
  public:
@@ -47,6 +49,7 @@ class TWReportingSessionRtcWorker final : public TWReportingSessionWorkerConsume
   std::shared_ptr<Strand> linkReportQueue_;
   std::shared_ptr<RtcReporter> reporter_;  // the queue's work shares it
   std::uint64_t starts_ = 0;               // how many the reporter has been given
+  bool isStartDropped_ = false;            // the last one had no room, until the stop
 };
 
 }  // namespace tonewerk

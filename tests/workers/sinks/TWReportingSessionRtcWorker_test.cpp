@@ -46,6 +46,10 @@ class TWReportingSessionRtcWorkerTest : public ReportingTest {
     const auto messages = service(0).messages;
     return messages.empty() ? ValueMap() : messages.back().payload;
   }
+  // From now on the queue's thread has no room, and does not move until run().
+  void fillQueue() {
+    context->linkReportQueues().makeStrand()->submit(SinkQueue::Limits().waitingBytes, [] {});
+  }
   MemoryLinkReport::Session service(std::size_t at) const { return test.linkReport.session(at); }
   std::vector<std::string> texts() const { return test.log.textsOf("twri"); }
   std::vector<std::string> errors() const { return test.log.textsOf("twri", LogLevel::kError); }
@@ -547,6 +551,54 @@ TEST_F(TWReportingSessionRtcWorkerTest, WithoutRoomForTheSummaryTheSessionStillE
   startAndRun();
   const std::string large(std::size_t{1} << 20, 'x');
   for (int n = 0; n < 9; ++n) send({{"n", n}, {"large", large + std::to_string(n)}});
+  session->stop();
+  run();
+  test.linkReport.answer(0, {{"fleet"}});
+  run();
+  EXPECT_FALSE(service(0).isOpen);
+  EXPECT_EQ(service(0).flushCount, 1U);
+}
+
+// A stop that did not fit left the session of the service open.
+TEST_F(TWReportingSessionRtcWorkerTest, AStopIsNotDroppedWhenTheQueueHangs) {
+  startAndRun();
+  send({{"a", 1}});
+  fillQueue();
+  session->stop();
+  run();
+  EXPECT_THAT(service(0).messages, SizeIs(1));  // the summary did not fit
+  EXPECT_FALSE(service(0).isOpen);
+  EXPECT_EQ(service(0).flushCount, 1U);
+}
+
+// Messages of a session whose start did not fit went into the session before it.
+TEST_F(TWReportingSessionRtcWorkerTest, NothingOfASessionWhoseStartIsDroppedIsSent) {
+  startAndRun();
+  fillQueue();
+  session->stop();
+  session->start();
+  send({{"a", 2}});
+  run();
+  send({{"a", 3}});
+  session->stop();
+  run();
+  ASSERT_EQ(test.linkReport.count(), 1U);
+  EXPECT_THAT(service(0).messages, IsEmpty());
+  EXPECT_FALSE(service(0).isOpen);
+
+  session->start();
+  send({{"a", 4}});
+  run();
+  ASSERT_EQ(test.linkReport.count(), 2U);
+  EXPECT_THAT(service(1).messages, SizeIs(1));
+}
+
+TEST_F(TWReportingSessionRtcWorkerTest, AStopIsNotDroppedWhileTheQueueIsHeldAndFull) {
+  test.linkReport.answerLater();
+  startAndRun();
+  const auto held = context->linkReportQueues().makeStrand();
+  held->submit(0, [&held] { held->hold(); });
+  held->submit(StrandPool::kMaxHeldBytes - 256, [] {});
   session->stop();
   run();
   test.linkReport.answer(0, {{"fleet"}});
