@@ -23,6 +23,8 @@ constexpr double kDefaultItems = 500;
 // Preferences are clamped to this, so that they fit into every type they are converted to.
 constexpr double kUnbounded = 1e9;
 constexpr int kCollectorNiceness = 5;
+// How long an item may take after its evidence is collected, before the disk counts as hanging.
+constexpr std::chrono::seconds kLongestWriting{10};
 constexpr const char* kRequestFile = "request.json";
 
 bool isNumber(const Value& value) {
@@ -59,6 +61,7 @@ DiagnosticsStore::DiagnosticsStore(std::string stateDirectory,
       log_(log),
       limits_(limits),
       directory_(std::move(stateDirectory)),
+      longestItem_(limits.collectors.time * collectors.size() + kLongestWriting),
       runner_(std::move(collectors), limits.collectors),
       thread_([this] { run(); }) {}
 
@@ -78,6 +81,7 @@ std::error_code DiagnosticsStore::add(DiagnosticItem item, Completion completion
                       (pending_.empty() || pendingBytes_ + bytes <= limits_.pendingBytes);
     if (!fits) {
       const bool isFirst = refused_++ == 0;
+      ++lost_;
       if (isFirst) errorLog(log_, "too many diagnostics at once; requests are refused");
       return std::make_error_code(std::errc::no_buffer_space);
     }
@@ -91,6 +95,16 @@ std::error_code DiagnosticsStore::add(DiagnosticItem item, Completion completion
   if (refusedBefore > 0)
     errorLog(log_, "diagnostics are taken again; refused meanwhile: %llu", refusedBefore);
   return {};
+}
+
+SinkStatus DiagnosticsStore::status() const {
+  const auto now = std::chrono::steady_clock::now();
+  const MutexLock lock(mutex_);
+  SinkStatus status{
+      .name = "diagnostics", .waiting = pending_.size() + (isIdle_ ? 0 : 1), .dropped = lost_, .hangs = {}};
+  const bool moves = isIdle_ || now - busySince_ < longestItem_;
+  if (!moves) status.hangs = std::chrono::ceil<std::chrono::seconds>(now - busySince_);
+  return status;
 }
 
 void DiagnosticsStore::finish(std::chrono::milliseconds timeout) {
@@ -129,6 +143,7 @@ std::optional<DiagnosticsStore::Pending> DiagnosticsStore::take() {
     while (!isEnding_ && !sweepIsDue_ && pending_.empty()) changed_.wait(lock);
     if (pending_.empty() && !sweepIsDue_) return std::nullopt;
     isIdle_ = false;
+    busySince_ = std::chrono::steady_clock::now();
     if (std::exchange(sweepIsDue_, false)) {
       lock.unlock();
       sweep();
@@ -148,6 +163,8 @@ void DiagnosticsStore::process(const Pending& pending) {
   const std::error_code error = writeItem(pending.item, name, pending.requestedAt);
   if (error) {
     errorLog(log_, "cannot write %s: %s", path, error.message());
+    const MutexLock lock(mutex_);
+    ++lost_;
   } else {
     infoLog(log_, "wrote %s", path);
   }

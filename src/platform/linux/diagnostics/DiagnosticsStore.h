@@ -14,6 +14,7 @@
 #include <thread>
 #include <vector>
 
+#include "platform/SinkStatus.h"
 #include "platform/linux/diagnostics/DiagnosticsDirectory.h"
 #include "platform/linux/diagnostics/collectors/CollectorRunner.h"
 #include "platform/linux/diagnostics/collectors/DiagnosticItem.h"
@@ -72,6 +73,9 @@ class DiagnosticsStore {
   // If an item with this name exists, the completion gets std::errc::file_exists.
   [[nodiscard]] std::error_code add(DiagnosticItem item, Completion completion);
 
+  // Any thread. Counts items. The store hangs when an item takes longer than its collectors may.
+  SinkStatus status() const;
+
   // Lets the store's thread remove incomplete items that a crash left behind. Call it only when no other
   // daemon can be writing to the directory, because the items that one is writing look the same.
   void removeLeftovers();
@@ -110,16 +114,19 @@ class DiagnosticsStore {
   const LogCategory& log_;
   const Limits limits_;
   const DiagnosticsDirectory directory_;
+  const std::chrono::milliseconds longestItem_;
   CollectorRunner runner_;
   std::string loggedWrongBounds_;  // used by the thread only
 
-  Mutex mutex_;
+  mutable Mutex mutex_;
   Condition changed_;
   std::deque<Pending> pending_ GUARDED_BY(mutex_);
   std::size_t pendingBytes_ GUARDED_BY(mutex_) = 0;
   std::uint64_t refused_ GUARDED_BY(mutex_) = 0;  // since the queue was last empty
+  std::uint64_t lost_ GUARDED_BY(mutex_) = 0;     // refused, or not written
+  std::chrono::steady_clock::time_point busySince_ GUARDED_BY(mutex_);
   bool isEnding_ GUARDED_BY(mutex_) = false;
-  bool isIdle_ GUARDED_BY(mutex_) = false;
+  bool isIdle_ GUARDED_BY(mutex_) = true;
   bool sweepIsDue_ GUARDED_BY(mutex_) = false;
 
   std::thread thread_;  // last: it uses all above

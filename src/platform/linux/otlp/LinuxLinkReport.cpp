@@ -181,6 +181,18 @@ OtlpResource LinuxLinkReport::resource() const {
   return resource;
 }
 
+SinkStatus LinuxLinkReport::status() {
+  SinkStatus status{.name = "endpoints", .hangs = {}};
+  const MutexLock lock(mutex_);
+  for (const auto& [url, exporter] : exporters_) {
+    status.waiting += exporter->waiting();
+    status.dropped += exporter->dropped();
+    const auto still = std::chrono::floor<std::chrono::seconds>(exporter->stillSince());
+    if (still >= kHangTime) status.hangs = std::max(status.hangs, still);
+  }
+  return status;
+}
+
 bool LinuxLinkReport::finish(std::chrono::milliseconds timeout) {
   const auto deadline = std::chrono::steady_clock::now() + timeout;
   std::vector<OtlpExporter*> exporters;

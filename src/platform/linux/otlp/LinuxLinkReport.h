@@ -10,6 +10,7 @@
 #include <string_view>
 
 #include "platform/LinkReport.h"
+#include "platform/SinkStatus.h"
 #include "platform/linux/files/Ulid.h"
 #include "platform/linux/otlp/OtlpExporter.h"
 #include "values/Mutex.h"
@@ -37,6 +38,8 @@ class LinuxLinkReport final : public LinkReport {
   static constexpr std::string_view kEventNameAttributeKey = "event_name_attribute";
   // Larger payloads are refused. Only a summary can be so large.
   static constexpr std::size_t kMaxPayloadBytes = std::size_t{32} << 20;
+  // Longer than a batch waits for its time.
+  static constexpr std::chrono::seconds kHangTime{15};
 
   using HttpClientMaker = std::function<std::unique_ptr<HttpClient>()>;
 
@@ -52,6 +55,10 @@ class LinuxLinkReport final : public LinkReport {
       const std::optional<std::string>& parentToken) override;
   [[nodiscard]] std::unique_ptr<LinkReportSession> initWithSessionInfo(
       const ValueMap& sessionInfo, const ValueMap& userInfo, const ValueArray* frameworksToCheck) override;
+
+  // Any thread. Counts the records for all endpoints. Endpoints hang when one of them has taken no record for
+  // kHangTime.
+  SinkStatus status();
 
   // Sends all waiting records within `timeout`. Nothing is sent after that. False if records are left.
   [[nodiscard]] bool finish(std::chrono::milliseconds timeout);

@@ -36,6 +36,8 @@ void OtlpExporter::flush() {
   if (outbox_.flush()) wake();
 }
 
+std::chrono::nanoseconds OtlpExporter::stillSince() const { return outbox_.stillSince(clock_.monotonic()); }
+
 void OtlpExporter::beginEnd() {
   (void)outbox_.flush();  // the thread is woken below in any case
   const MutexLock lock(mutex_);

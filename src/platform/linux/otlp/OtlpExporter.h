@@ -2,6 +2,8 @@
 #pragma once
 
 #include <chrono>
+#include <cstddef>
+#include <cstdint>
 #include <memory>
 #include <string>
 #include <thread>
@@ -37,6 +39,11 @@ class OtlpExporter {
   [[nodiscard]] bool add(const OtlpLogRecord& record, OtlpOutbox::Urgency urgency);
   // Sends records now that are waiting for a full batch.
   void flush();
+
+  // Any thread. Counts records; see OtlpOutbox::stillSince().
+  std::size_t waiting() const { return outbox_.count(); }
+  std::uint64_t dropped() const { return outbox_.allDropped(); }
+  std::chrono::nanoseconds stillSince() const;
 
   // Starts the end: the thread sends all waiting records, tries failed ones once more, and then stops.
   void beginEnd();

@@ -19,10 +19,11 @@ OtlpOutbox::Added OtlpOutbox::add(std::string record, Urgency urgency, Time now)
   const std::size_t bytes = bytesOf(record);
   if (bytes_ + bytes > limits_.bytes) {
     ++dropped_;
+    ++allDropped_;
     return Added::kDropped;
   }
   bytes_ += bytes;
-  ++count_;
+  if (count_++ == 0) movedAt_ = now;
   const bool isUrgent = urgency == Urgency::kAtOnce;
   std::deque<Waiting>& waiting = isUrgent ? atOnce_ : batched_;
   waiting.push_back({std::move(record), now});
@@ -72,8 +73,9 @@ OtlpOutbox::Batch OtlpOutbox::takeFrom(std::deque<Waiting>& waiting) {
   return batch;
 }
 
-void OtlpOutbox::settle(const Batch& batch) {
+void OtlpOutbox::settle(const Batch& batch, Time now) {
   const MutexLock lock(mutex_);
+  movedAt_ = now;
   bytes_ -= batch.bytes;
   count_ -= batch.records.size();
 }
@@ -86,6 +88,16 @@ std::uint64_t OtlpOutbox::takeDropped() {
 std::size_t OtlpOutbox::count() const {
   const MutexLock lock(mutex_);
   return count_;
+}
+
+std::uint64_t OtlpOutbox::allDropped() const {
+  const MutexLock lock(mutex_);
+  return allDropped_;
+}
+
+OtlpOutbox::Time OtlpOutbox::stillSince(Time now) const {
+  const MutexLock lock(mutex_);
+  return count_ == 0 ? Time(0) : now - movedAt_;
 }
 
 }  // namespace tonewerk

@@ -54,12 +54,16 @@ class OtlpOutbox {
   // record is larger. Empty if no record is due.
   [[nodiscard]] Batch take(Time now);
   // Frees the room of a batch that was delivered or dropped.
-  void settle(const Batch& batch);
+  void settle(const Batch& batch, Time now);
 
   // The number of records that were dropped for lack of room since the last call.
   [[nodiscard]] std::uint64_t takeDropped();
   // The number of records that wait or are being exported.
   std::size_t count() const;
+  // How many records were ever dropped for lack of room.
+  std::uint64_t allDropped() const;
+  // How long no record has left while at least one was there; 0 while there is none.
+  Time stillSince(Time now) const;
 
  private:
   struct Waiting {
@@ -78,6 +82,8 @@ class OtlpOutbox {
   std::size_t bytes_ GUARDED_BY(mutex_) = 0;
   std::size_t count_ GUARDED_BY(mutex_) = 0;
   std::uint64_t dropped_ GUARDED_BY(mutex_) = 0;
+  std::uint64_t allDropped_ GUARDED_BY(mutex_) = 0;
+  Time movedAt_ GUARDED_BY(mutex_){0};
 };
 
 }  // namespace tonewerk

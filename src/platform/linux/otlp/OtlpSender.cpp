@@ -67,7 +67,7 @@ OtlpSender::Outcome OtlpSender::sendNext() {
       delivered(taken_.front(), answer);
       break;
   }
-  outbox_.settle(taken_.front());
+  outbox_.settle(taken_.front(), clock_.monotonic());
   taken_.pop_front();
   return Outcome::kContinue;
 }

@@ -74,6 +74,9 @@ class ReportStore {
   // `timeout`.
   [[nodiscard]] bool flush(std::chrono::milliseconds timeout);
 
+  // Any thread. Counts rows.
+  SinkStatus status() const { return queue_.status(); }
+
   // Any thread. The store's thread beats with each try to write, also one that fails, and while SQLite gets
   // on with a long statement. It rests while there is nothing to write. So it stands still when the disk
   // hangs.

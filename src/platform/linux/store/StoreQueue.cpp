@@ -42,6 +42,7 @@ StoreCharges StoreQueue::charges() const {
 bool StoreQueue::isTaken(const StoreRowOwner& owner, std::size_t bytes) {
   if (fits(bytes) && (waitsForRoom_ || isWithinHalf(owner))) return true;
   ++dropped_;
+  ++allDropped_;
   if (owner.account != nullptr) owner.account->countRefusal(Resource::kSinkBytes);
   return false;
 }
@@ -65,6 +66,7 @@ StoreBatch& StoreQueue::batchWithRoom() {
 void StoreQueue::countAdded(std::size_t bytes, const StoreRowOwner& owner) {
   if (waitsForRoom_ && owner.account != nullptr) owner.account->charge(Resource::kSinkBytes, owner.charge);
   const bool wasUrgent = isUrgent();
+  if (queuedRows_ + takenRows_ == 0) movedAt_ = std::chrono::steady_clock::now();
   ++queuedRows_;
   queuedBytes_ += bytes;
   ++added_;
@@ -108,6 +110,7 @@ bool StoreQueue::take(StoreBatch& batch, bool wait) {
     spare_ = std::move(full_.front());
     full_.pop_front();
   }
+  movedAt_ = std::chrono::steady_clock::now();
   takenRows_ = batch.rows();
   takenBytes_ = batch.bytes();
   takenCharges_ = batch.charges();
@@ -139,6 +142,7 @@ void StoreQueue::committed() {
   const MutexLock lock(mutex_);
   if (!std::exchange(waitsForRoom_, true)) charges().charge();
   committed_ += std::exchange(takenRows_, 0);
+  movedAt_ = std::chrono::steady_clock::now();
   takenBytes_ = 0;
   room_.notifyAll();
   progress_.notifyAll();
@@ -167,6 +171,16 @@ bool StoreQueue::pause(std::chrono::nanoseconds time) {
 std::uint64_t StoreQueue::takeDropped() {
   const MutexLock lock(mutex_);
   return std::exchange(dropped_, 0);
+}
+
+SinkStatus StoreQueue::status() const {
+  const auto now = std::chrono::steady_clock::now();
+  const MutexLock lock(mutex_);
+  SinkStatus status{
+      .name = "store", .waiting = queuedRows_ + takenRows_, .dropped = allDropped_, .hangs = {}};
+  const bool moves = status.waiting == 0 || now - movedAt_ < limits_.hold;
+  if (!moves) status.hangs = std::chrono::ceil<std::chrono::seconds>(now - movedAt_);
+  return status;
 }
 
 std::uint64_t StoreQueue::lost() const {

@@ -7,6 +7,7 @@
 #include <cstdint>
 #include <deque>
 
+#include "platform/SinkStatus.h"
 #include "platform/accounts/WorkingFor.h"
 #include "platform/linux/store/StoreBatch.h"
 #include "values/Mutex.h"
@@ -105,6 +106,9 @@ class StoreQueue {
 
   // Any thread. The number of rows dropped since the last call.
   [[nodiscard]] std::uint64_t takeDropped();
+  // Any thread. All rows that wait or are being written, all that were dropped, and for how long the writer
+  // has taken and committed none, once that is longer than the hold time.
+  SinkStatus status() const;
   // Any thread. The rows that are not committed, and those dropped since the last takeDropped(). They are
   // lost when the writer has ended.
   std::uint64_t lost() const;
@@ -156,6 +160,9 @@ class StoreQueue {
   std::uint64_t added_ GUARDED_BY(mutex_) = 0;
   std::uint64_t committed_ GUARDED_BY(mutex_) = 0;
   std::uint64_t dropped_ GUARDED_BY(mutex_) = 0;
+  std::uint64_t allDropped_ GUARDED_BY(mutex_) = 0;
+  // When the first row came into the empty queue, or later the writer took or committed a batch.
+  std::chrono::steady_clock::time_point movedAt_ GUARDED_BY(mutex_);
   // Flushes are numbered. When a try to write fails, the flushes fail that were asked for before it began.
   std::uint64_t lastFlush_ GUARDED_BY(mutex_) = 0;
   std::uint64_t attemptedFlush_ GUARDED_BY(mutex_) = 0;

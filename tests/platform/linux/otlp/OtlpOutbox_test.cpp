@@ -85,7 +85,7 @@ TEST_F(OtlpOutboxTest, KeepsEightMegabytesUntilTheyAreSettled) {
   EXPECT_TRUE(outbox_.flush());
   const OtlpOutbox::Batch batch = outbox_.take(now_);
   EXPECT_EQ(add("taken is not gone"), Added::kDropped);
-  outbox_.settle(batch);
+  outbox_.settle(batch, OtlpOutbox::Time(0));
   EXPECT_NE(add(megabyte), Added::kDropped);
   EXPECT_EQ(outbox_.count(), 9U - batch.records.size());
   EXPECT_EQ(outbox_.takeDropped(), 2U);
