@@ -22,6 +22,7 @@
 #include "platform/linux/log/CondensingLog.h"
 #include "platform/linux/log/EscapingLog.h"
 #include "platform/linux/log/FairLog.h"
+#include "platform/linux/log/QueuedLog.h"
 #include "platform/linux/log/RecentLines.h"
 #include "platform/linux/log/RememberingLog.h"
 #include "platform/linux/log/StandardLog.h"
@@ -57,11 +58,18 @@ std::string temporaryDirectory() {
   return error ? "/tmp" : path.string();
 }
 
+std::unique_ptr<QueuedLog> makeQueuedLog(const Clock& clock, QueuedLog*& made) {
+  auto log = std::make_unique<QueuedLog>(makeStandardLog(clock), clock);
+  log->writeLinesBeforeFatalSignals();
+  made = log.get();
+  return log;
+}
+
 // A line takes the way from below to above: lines that are held back cost nothing more, and whatever is
 // written or kept is escaped.
-std::unique_ptr<Log> makeLog(const Clock& clock, const std::shared_ptr<RecentLines>& recentLines) {
-  std::unique_ptr<Log> log = makeStandardLog(clock);
-  log = std::make_unique<RememberingLog>(std::move(log), recentLines, clock);
+std::unique_ptr<Log> makeLog(std::unique_ptr<QueuedLog> queuedLog, const Clock& clock,
+                             const std::shared_ptr<RecentLines>& recentLines) {
+  std::unique_ptr<Log> log = std::make_unique<RememberingLog>(std::move(queuedLog), recentLines, clock);
   log = std::make_unique<CondensingLog>(std::move(log), clock);
   log = std::make_unique<EscapingLog>(std::move(log));
   return std::make_unique<FairLog>(std::move(log), clock);
@@ -83,7 +91,8 @@ struct LinuxPlatform::Adapters {
   SystemClock clock;
   Accounts accounts{::geteuid(), clock};
   const std::shared_ptr<RecentLines> logLines = std::make_shared<RecentLines>();
-  std::unique_ptr<Log> log = makeLog(clock, logLines);
+  QueuedLog* queuedLog = nullptr;  // a part of the log
+  std::unique_ptr<Log> log = makeLog(makeQueuedLog(clock, queuedLog), clock, logLines);
   LogCategory category{*log, "com.orvane.tonewerk", "twrs"};  // the adapters' own lines
   UsdtTracePoints tracePoints;
   ThreadQueueFactory queues;
@@ -115,6 +124,10 @@ LinuxPlatform::LinuxPlatform(const Directories& directories)
 LinuxPlatform::~LinuxPlatform() = default;
 
 Log& LinuxPlatform::log() { return *adapters_->log; }
+SinkStatus LinuxPlatform::logStatus() { return adapters_->queuedLog->status(); }
+bool LinuxPlatform::flushLog(std::chrono::milliseconds timeout) {
+  return adapters_->queuedLog->flush(timeout);
+}
 Accounts& LinuxPlatform::accounts() { return adapters_->accounts; }
 Clock& LinuxPlatform::clock() { return adapters_->clock; }
 SerialQueueFactory& LinuxPlatform::queues() { return adapters_->queues; }

@@ -1,9 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <chrono>
 #include <memory>
 
 #include "platform/Platform.h"
+#include "platform/SinkStatus.h"
 
 namespace tonewerk {
 
@@ -26,6 +28,10 @@ class LinuxPlatform {
   ~LinuxPlatform();
 
   Log& log();
+  // How the log's queue stands.
+  SinkStatus logStatus();
+  // Waits until all lines are written; false after `timeout`. For ends of the process that destroy nothing.
+  [[nodiscard]] bool flushLog(std::chrono::milliseconds timeout);
   Accounts& accounts();
   Clock& clock();
   SerialQueueFactory& queues();

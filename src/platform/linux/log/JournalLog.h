@@ -5,7 +5,7 @@
 #include <optional>
 #include <string>
 
-#include "platform/Log.h"
+#include "platform/linux/log/LogOutput.h"
 #include "platform/linux/log/LogThreshold.h"
 
 namespace tonewerk {
@@ -15,7 +15,7 @@ namespace tonewerk {
 // searching:
 //
 //   journalctl TONEWERK_CATEGORY=twrr
-class JournalLog final : public Log {
+class JournalLog final : public LogOutput {
  public:
   explicit JournalLog(LogThreshold threshold) : threshold_(std::move(threshold)) {}
 
@@ -31,6 +31,13 @@ class JournalLog final : public Log {
   }
   void write(std::string_view subsystem, std::string_view category, LogLevel level,
              std::string_view message) override;
+
+  // The journal gives the entry the time at which it arrives, which is later than `at` after the journal has
+  // hung.
+  void writeAt(double /*at*/, std::string_view subsystem, std::string_view category, LogLevel level,
+               std::string_view message) override {
+    write(subsystem, category, level, message);
+  }
 
   // The fields of an entry, each as "NAME=value".
   static std::array<std::string, 6> fields(std::string_view subsystem, std::string_view category,

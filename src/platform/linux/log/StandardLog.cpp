@@ -18,7 +18,7 @@ std::string variable(const char* name) {
   return value == nullptr ? std::string() : value;
 }
 
-std::unique_ptr<Log> makeLog(const Clock& clock, LogThreshold threshold) {
+std::unique_ptr<LogOutput> makeLog(const Clock& clock, LogThreshold threshold) {
   if (JournalLog::isJournal(variable("JOURNAL_STREAM"), STDERR_FILENO)) {
     return std::make_unique<JournalLog>(std::move(threshold));
   }
@@ -27,12 +27,12 @@ std::unique_ptr<Log> makeLog(const Clock& clock, LogThreshold threshold) {
 
 }  // namespace
 
-std::unique_ptr<Log> makeStandardLog(const Clock& clock) {
+std::unique_ptr<LogOutput> makeStandardLog(const Clock& clock) {
   const std::string wanted = variable("TONEWERK_LOG");
   if (wanted.empty()) return makeLog(clock, LogThreshold());
   std::string problem;
   const std::optional<LogThreshold> threshold = LogThreshold::parse(wanted, problem);
-  std::unique_ptr<Log> log = makeLog(clock, threshold.value_or(LogThreshold()));
+  std::unique_ptr<LogOutput> log = makeLog(clock, threshold.value_or(LogThreshold()));
   if (!threshold) {
     const LogCategory category(*log, "com.orvane.tonewerk", "twrs");
     errorLog(category, "TONEWERK_LOG is not understood: %s. Using \"default\".", problem);

@@ -81,8 +81,9 @@ std::string StreamLog::format(double at, std::string_view category, LogLevel lev
   return line;
 }
 
-void StreamLog::write(std::string_view, std::string_view category, LogLevel level, std::string_view message) {
-  const std::string line = format(clock_.now(), category, level, message);
+void StreamLog::writeAt(double at, std::string_view, std::string_view category, LogLevel level,
+                        std::string_view message) {
+  const std::string line = format(at, category, level, message);
   const MutexLock lock(mutex_);
   writeAll(fileDescriptor_, line);
 }

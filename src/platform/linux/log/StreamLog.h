@@ -5,7 +5,7 @@
 #include <string>
 
 #include "platform/Clock.h"
-#include "platform/Log.h"
+#include "platform/linux/log/LogOutput.h"
 #include "platform/linux/log/LogThreshold.h"
 #include "values/Mutex.h"
 
@@ -18,7 +18,7 @@ namespace tonewerk {
 // A line is one write() if the file takes it whole, so that lines of several processes do not mix. Newlines
 // are written as they are; EscapingLog escapes those that the daemon did not put there. The process must
 // ignore SIGPIPE if the file may be a pipe without a reader.
-class StreamLog final : public Log {
+class StreamLog final : public LogOutput {
  public:
   // Does not close `fileDescriptor`. `clock` outlives the log.
   StreamLog(int fileDescriptor, const Clock& clock, LogThreshold threshold = LogThreshold());
@@ -30,7 +30,11 @@ class StreamLog final : public Log {
     return threshold_.of(category);
   }
   void write(std::string_view subsystem, std::string_view category, LogLevel level,
-             std::string_view message) override;
+             std::string_view message) override {
+    writeAt(clock_.now(), subsystem, category, level, message);
+  }
+  void writeAt(double at, std::string_view subsystem, std::string_view category, LogLevel level,
+               std::string_view message) override;
 
   // The line as it is written, with its newline. `at` is in seconds since 1970.
   static std::string format(double at, std::string_view category, LogLevel level, std::string_view message);
