@@ -33,5 +33,9 @@ inline const SharedString kWatchKeyName("name");
 inline const SharedString kWatchKeyHeld("held");
 inline const SharedString kWatchKeyShare("share");
 inline const SharedString kWatchKeyRefused("refused");
+inline const SharedString kWatchKeySinks("sinks");
+inline const SharedString kWatchKeyWaiting("waiting");
+inline const SharedString kWatchKeyDropped("dropped");
+inline const SharedString kWatchKeyHangs("hangs");
 
 }  // namespace tonewerk

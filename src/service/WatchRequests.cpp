@@ -11,9 +11,11 @@
 #include "platform/SerialQueue.h"
 #include "platform/accounts/Accounts.h"
 #include "platform/accounts/TurnQueue.h"
+#include "protocol/WatchKeys.h"
 #include "service/AccountListing.h"
 #include "service/MessageTap.h"
 #include "service/SessionListing.h"
+#include "service/SinkListing.h"
 #include "service/TWReportingServiceDelegateProtocol.h"
 #include "service/TapSubscriber.h"
 #include "session/TWReportingContext.h"
@@ -95,7 +97,11 @@ void WatchRequests::nextMessages(Reply reply, InFlightToken token) {
 }
 
 void WatchRequests::accounts(const Reply& reply) const {
-  reply(std::nullopt, accountListing(TWReportingContext::current().platform().accounts, *account_));
+  TWReportingContext& context = TWReportingContext::current();
+  ValueMap listing = accountListing(context.platform().accounts, *account_);
+  // How much waits says what other users do.
+  if (account_->isTrusted()) listing.set(kWatchKeySinks, sinkListing(context.sinks()));
+  reply(std::nullopt, listing);
 }
 
 }  // namespace tonewerk

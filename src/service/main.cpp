@@ -19,6 +19,7 @@
 #include "platform/Heartbeat.h"
 #include "platform/Log.h"
 #include "platform/Platform.h"
+#include "platform/SinkStatus.h"
 #include "platform/accounts/TurnQueue.h"
 #include "platform/linux/LinuxPlatform.h"
 #include "platform/linux/dbus/DbusListener.h"
@@ -121,6 +122,7 @@ class Daemon {
     // Read once here, so that reading the device facts again later does not change it.
     hasSignposts_ = context_.isInternalBuild() && isTracingBuiltIn();
     watchHeartbeats();
+    addSinks();
     listener_.setDelegate(*service_);
     listener_.resume();
     dbusListener_.setDelegate(*service_);
@@ -175,6 +177,14 @@ class Daemon {
     heartbeats_.watch("D-Bus", dbusListener_.heartbeat());
     context_.reportingServerQueue().async(
         [this] { heartbeats_.watch("the work queue", Heartbeat::ofThisThread()); });
+  }
+
+  void addSinks() {
+    SinkList& sinks = context_.sinks();
+    sinks.add([this] { return store_.status(); });
+    sinks.add([this] { return diagnostics_.status(); });
+    sinks.add([this] { return linkReport_.status(); });
+    sinks.add([this] { return linux_.logStatus(); });
   }
 
   void markSignposts() {

@@ -8,9 +8,21 @@
 #include "tools/twctl/DaemonCalls.h"
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/show/AccountTable.h"
+#include "tools/twctl/show/SinkTable.h"
 
 namespace tonewerk {
 namespace {
+
+void showSinks(Tool& tool, const ValueMap& listing) {
+  const Value* found = listing.find(kWatchKeySinks);
+  const ValueArray* sinks = found == nullptr ? nullptr : found->asArray();
+  if (sinks == nullptr || sinks->empty()) return;
+  if (!tool.asJson) tool.out << "\n";
+  SinkTable table(tool);
+  for (const Value& sink : *sinks) {
+    if (sink.asMap() != nullptr) table.add(*sink.asMap());
+  }
+}
 
 void showStatus(Tool& tool) {
   DaemonCalls daemon(tool);
@@ -32,15 +44,21 @@ void showStatus(Tool& tool) {
   if (total > accounts->size() && !tool.asJson) {
     tool.out << "and " << total - accounts->size() << " more users\n";
   }
+  showSinks(tool, *listing);
 }
 
 }  // namespace
 
 void addStatusCommand(CLI::App& app, Tool& tool) {
-  CLI::App& command = addCommand(app, tool, "status", "What each user holds in the daemon, and was refused");
+  CLI::App& command =
+      addCommand(app, tool, "status", "What each user holds in the daemon, and how its sinks stand");
   command.footer(
       "A row for each thing that a user's clients hold: how much, the most they may hold now, and how often\n"
-      "more was refused. Trusted users see all users, others themselves.");
+      "more was refused. Trusted users see all users, others themselves. Trusted users see a second table, "
+      "with\n"
+      "a row for each sink of reports: how much waits to be written, how much was dropped because the sink "
+      "did\n"
+      "not take it, and for how many seconds it has hung.");
   command.callback([&tool] { showStatus(tool); });
 }
 

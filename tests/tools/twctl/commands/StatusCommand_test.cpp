@@ -59,6 +59,24 @@ TEST_F(StatusCommandTest, GivesProgramsNumbers) {
                                  "\"held\":1572864,\"share\":268435456,\"refused\":2}\n"));
 }
 
+TEST_F(StatusCommandTest, ShowsWhichSinksHangAndWhatTheyDropped) {
+  const ValueArray sinks{ValueMap{{"name", "store"}, {"waiting", 17}, {"dropped", 0}, {"hangs", 0}},
+                         ValueMap{{"name", "jsonFiles"}, {"waiting", 3}, {"dropped", 2}, {"hangs", 41}}};
+  daemon.answer("watch.accounts", ValueMap{{"total", 0}, {"accounts", ValueArray{}}, {"sinks", sinks}});
+  EXPECT_EQ(run({"status"}), kDone);
+  EXPECT_THAT(out.str(), testing::HasSubstr("\n"
+                                            "sink       waiting  dropped  hangs\n"
+                                            "store      17       0        no\n"
+                                            "jsonFiles  3        2        41 s\n"));
+}
+
+TEST_F(StatusCommandTest, GivesProgramsALineForEachSink) {
+  const ValueArray sinks{ValueMap{{"name", "store"}, {"waiting", 17}, {"dropped", 1}, {"hangs", 0}}};
+  daemon.answer("watch.accounts", ValueMap{{"total", 0}, {"accounts", ValueArray{}}, {"sinks", sinks}});
+  EXPECT_EQ(run({"status", "--json"}), kDone);
+  EXPECT_EQ(out.str(), "{\"sink\":\"store\",\"waiting\":17,\"dropped\":1,\"hangs\":0}\n");
+}
+
 TEST_F(StatusCommandTest, SaysHowManyUsersAreMissing) {
   answerTwoUsers(600);
   EXPECT_EQ(run({"status"}), kDone);

@@ -1,0 +1,23 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include "tools/twctl/Tool.h"
+#include "tools/twctl/show/Table.h"
+
+namespace tonewerk {
+
+class ValueMap;
+
+// Prints for `twctl status` how the daemon's sinks stand, a row for each.
+class SinkTable {
+ public:
+  explicit SinkTable(const Tool& tool);
+
+  // `sink` is one of the answer to watch.accounts.
+  void add(const ValueMap& sink);
+
+ private:
+  Table table_;
+};
+
+}  // namespace tonewerk
