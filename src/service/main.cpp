@@ -2,6 +2,8 @@
 //
 // twreportingd: puts the daemon together and runs it until a signal or the kill request ends it.
 
+#include <algorithm>
+#include <array>
 #include <chrono>
 #include <csignal>
 #include <cstddef>
@@ -20,6 +22,7 @@
 #include "platform/Log.h"
 #include "platform/Platform.h"
 #include "platform/SinkStatus.h"
+#include "platform/TimerService.h"
 #include "platform/accounts/TurnQueue.h"
 #include "platform/linux/LinuxPlatform.h"
 #include "platform/linux/dbus/DbusListener.h"
@@ -62,6 +65,10 @@ constexpr int kKilled = 2;
 constexpr std::chrono::seconds kFlushTimeout{10};
 // How long it waits for network endpoints.
 constexpr std::chrono::seconds kNetworkTimeout{5};
+// How long it waits for a log that takes no lines.
+constexpr std::chrono::seconds kLogTimeout{2};
+// After this time the end waits for nothing any more: a thread of the daemon hangs.
+constexpr std::chrono::seconds kLongestEnd{60};
 // How long it still collects evidence.
 constexpr std::chrono::seconds kDiagnosticsTimeout{3};
 
@@ -167,7 +174,18 @@ class Daemon {
       TWReportingSystemMonitor::reset();  // while the queue of its handlers exists
     });
     queue.drain();
-    flushSinks();
+    (void)flushSinks();
+  }
+
+  // Whether the destructor would wait for a disk that does not answer.
+  bool hangs() {
+    const std::array statuses{store_.status(), diagnostics_.status(), context_.fileSinkQueue().status(),
+                              context_.linkReportQueues().status()};
+    const auto hung = std::find_if(statuses.begin(), statuses.end(),
+                                   [](const SinkStatus& status) { return status.hangs.count() > 0; });
+    if (hung == statuses.end()) return false;
+    errorLog(log_, "%@ hangs; what is not written is lost: %llu", hung->name, hung->waiting);
+    return true;
   }
 
  private:
@@ -212,17 +230,34 @@ class Daemon {
   [[noreturn]] void endOnKillRequest() {
     const MutexLock lock(killMutex_);
     manager_.tellStopping("Killed by a client; finishing reports");
-    flushSinks();
+    (void)flushSinks();
+    (void)linux_.flushLog(kLogTimeout);
     ::_exit(kKilled);
   }
 
-  void flushSinks() {
-    context_.fileSinkQueue().drain();
-    context_.linkReportQueues().drain();
+  // Waits until files and rows are written. False when the disk hangs, which is logged.
+  bool areReportsWritten() {
+    const bool areFilesWritten = context_.fileSinkQueue().drain(kFlushTimeout);
+    if (!areFilesWritten) errorLog(log_, "files are not written: the disk hangs");
+    return store_.flush(kFlushTimeout) && areFilesWritten;
+  }
+
+  // Sinks that hang are given up, each after a time of its own. What is flushed later, and the destructors,
+  // may wait for them all the same, so the process ends after kLongestEnd. True when everything is written
+  // that stays on the device.
+  bool flushSinks() {
+    endGuard_ = linux_.timers().repeat(kLongestEnd, [this] {
+      errorLog(log_, "the end takes too long because something hangs; what is not written is lost");
+      (void)linux_.flushLog(kLogTimeout);
+      ::_exit(kFailure);
+    });
+    (void)context_.fileSinkQueue().drain(kFlushTimeout);
+    (void)context_.linkReportQueues().drain(kFlushTimeout);
     (void)linkReport_.finish(kNetworkTimeout);  // the exporters log what is lost
-    (void)store_.flush(kFlushTimeout);          // the store logs a failure
+    const bool areWritten = areReportsWritten();
     capsa_.finish();
     diagnostics_.finish(kDiagnosticsTimeout);
+    return areWritten;
   }
 
   const ServiceManager& manager_;
@@ -230,6 +265,7 @@ class Daemon {
   LinuxPlatform& linux_;
   const std::string runtimeDirectory_;
   const LogCategory& log_;
+  std::unique_ptr<Timer> endGuard_;  // made for the end; ends after what may hang
   bool hasSignposts_ = false;
   Heartbeats heartbeats_;
   ReportStore store_;
@@ -304,6 +340,10 @@ int run() {
   Daemon daemon(directories, std::move(socket), linux, manager, log);
   serveUntilEndSignal(daemon);
   daemon.endInOrder();
+  if (daemon.hangs()) {
+    (void)linux.flushLog(kLogTimeout);
+    ::_exit(kFailure);
+  }
   return kSuccess;
 }
 
