@@ -57,6 +57,8 @@ std::vector<Preference> allPreferences() {
        .fallback = memoryTools,
        .meaning = "The memory log's two commands",
        .count = 2},
+      {kTwreporting, "summary_megabytes", kNumber, 256, "MiB that JSON summary files take", 1.0},
+      {kTwreporting, "summary_days", kNumber, 30, "Age of the oldest JSON summary file in days", 1.0},
       {kTwreporting, "VidroComponentIdentifier", kInteger, 0, "The drafts' component in the bug tracker"},
       {.domain = kTwreporting,
        .key = "VidroInvalidXyIDRlastRun",

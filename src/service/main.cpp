@@ -52,6 +52,7 @@
 #include "session/TWReportingUtility.h"
 #include "values/Mutex.h"
 #include "workers/TWReportingWorkerClasses.h"
+#include "workers/sinks/TWReportingSessionSummaryJsonFileWorker.h"
 
 namespace tonewerk {
 namespace {
@@ -126,6 +127,7 @@ class Daemon {
         dbusListener_(dbusNames(), requests::all(), dbusAddressFromEnvironment(), log, linux.accounts(),
                       &linux.memory()) {
     diagnostics_.removeLeftovers();  // this daemon has the socket, so no other one writes there
+    TWReportingSessionSummaryJsonFileWorker::tidyDirectory();
     // Read once here, so that reading the device facts again later does not change it.
     hasSignposts_ = context_.isInternalBuild() && isTracingBuiltIn();
     watchHeartbeats();

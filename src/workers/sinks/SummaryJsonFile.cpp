@@ -71,6 +71,7 @@ std::error_code SummaryJsonFile::withFreeName(
 
 void SummaryJsonFile::writeLine(std::string_view text) {
   if (reportFileHandle_ == nullptr) return;
+  bytes_ += text.size() + 1;
   // Only a failure to write the line's end is logged: a file that refuses the text refuses the end, too. All
   // later lines fail with the same error, so that is logged once. The file does not appear then, and
   // closeFile() logs that.

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <cstddef>
+#include <cstdint>
 #include <functional>
 #include <map>
 #include <memory>
@@ -47,6 +48,9 @@ class SummaryJsonFile {
   // False when there were messages and there is no file.
   [[nodiscard]] bool closeFile();
 
+  // What the file holds, in bytes.
+  std::uint64_t bytes() const { return bytes_; }
+
  private:
   struct Kind {
     std::string name;              // as in "Volume_Summary"
@@ -71,6 +75,7 @@ class SummaryJsonFile {
   std::unique_ptr<NewFile> reportFileHandle_;
   std::string lines_;  // whole lines of entries that are not written yet, with their ends
   std::string member_;
+  std::uint64_t bytes_ = 0;
   bool hasLoggedLine_ = false;  // that a line of this file could not be written
   bool hasEntry_ = false;       // whether an entry with a text was written
   std::map<std::string, std::size_t> counts_;

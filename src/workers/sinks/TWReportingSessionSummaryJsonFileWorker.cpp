@@ -15,6 +15,7 @@
 #include "session/TWReportingSession.h"
 #include "session/TWReportingUtility.h"
 #include "values/Prefetch.h"
+#include "workers/sinks/SummaryDirectory.h"
 #include "workers/sinks/SummaryJsonFile.h"
 
 namespace tonewerk {
@@ -44,6 +45,11 @@ bool writeFile(SummaryJsonFile& file, std::vector<Entry>& entries) {
   return file.closeFile();
 }
 
+SummaryDirectory& summaryDirectory() {
+  return TWReportingContext::current().singletons().get<SummaryDirectory>(
+      TWReportingSessionSummaryJsonFileWorker::TWReportingLogsDirectory());
+}
+
 }  // namespace
 
 const TWReportingSessionWorkerClass TWReportingSessionSummaryJsonFileWorker::kWorkerClass =
@@ -71,6 +77,10 @@ std::string TWReportingSessionSummaryJsonFileWorker::fileNameFor(const TWReporti
          TWReportingUtilityGenerateServiceNameFromServiceType(session.serviceType()) + ".json";
 }
 
+void TWReportingSessionSummaryJsonFileWorker::tidyDirectory() {
+  TWReportingContext::current().fileSinkQueue().post([] { summaryDirectory().tidy(); });
+}
+
 void TWReportingSessionSummaryJsonFileWorker::stop() {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto owner = session.lock();
@@ -90,7 +100,8 @@ void TWReportingSessionSummaryJsonFileWorker::stop() {
       bytes,
       [&queue, file = std::make_unique<SummaryJsonFile>(TWReportingLogsDirectory(), fileNameFor(*owner)),
        entries = std::move(entries)]() mutable {
-        if (!writeFile(*file, entries)) queue.countLost();
+        if (!writeFile(*file, entries)) return queue.countLost();
+        if (file->bytes() > 0) summaryDirectory().added(file->bytes());
       }));
 }
 

@@ -13,7 +13,7 @@ namespace tonewerk {
 // service.
 //
 // The messages are taken on the work queue. The file is written on the file sinks' own queue, which drops it
-// when the disk hangs.
+// when the disk hangs. After that the directory is kept within its bounds (SummaryDirectory.h).
 class TWReportingSessionSummaryJsonFileWorker final : public TWReportingSessionWorkerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
@@ -24,6 +24,10 @@ class TWReportingSessionSummaryJsonFileWorker final : public TWReportingSessionW
       const std::shared_ptr<TWReportingSession>& session);
 
   void stop() override;
+
+  // Queues the removal of what an earlier daemon left in the directory unfinished, and of what is too old or
+  // too much. For the daemon's start.
+  static void tidyDirectory();
 
   // "<logs>/Audio/Reporting".
   static std::string TWReportingLogsDirectory();

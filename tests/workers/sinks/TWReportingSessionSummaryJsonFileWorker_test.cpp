@@ -207,6 +207,21 @@ TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, AFileThatCannotBeWrittenIsCo
   EXPECT_EQ(context->fileSinkQueue().status().dropped, 1U);
 }
 
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, ANewFileDrivesOutTheOldestOnes) {
+  EXPECT_FALSE(test.preferences.write("com.orvane.tonewerk.twreporting", "summary_megabytes", 1));
+  const std::string old = std::string(kDirectory) + "/20200101-000000+0000-1-Unknown-test.json";
+  test.files.addFile(old, std::string(2U << 20U, 'x'), -1.0);
+  session->start();
+  stop();
+  EXPECT_THAT(test.files.files(), ElementsAre(kPath));
+}
+
+TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, TheDaemonsStartRemovesWhatAnEarlierOneLeftUnfinished) {
+  TWReportingSessionSummaryJsonFileWorker::tidyDirectory();
+  context->fileSinkQueue().drain();
+  EXPECT_THAT(test.files.swept(), ElementsAre(kDirectory));
+}
+
 // Once, the second file replaced the first.
 TEST_F(TWReportingSessionSummaryJsonFileWorkerTest, StopsWithinOneSecondWriteFilesWithNumbers) {
   for (const char* run : {"first", "second", "third"}) {
