@@ -10,7 +10,10 @@
 #include <utility>
 #include <vector>
 
+#include "platform/Log.h"
+#include "platform/MemoryReserve.h"
 #include "platform/Platform.h"
+#include "platform/accounts/Account.h"
 #include "platform/accounts/WorkingFor.h"
 #include "protocol/Requests.h"
 #include "service/WatchRequests.h"
@@ -143,6 +146,14 @@ static_assert(std::none_of(requests::kAll.begin(), requests::kAll.end(),
               "the way of messages does not ask who the caller is");
 static_assert(std::size(kHandlers) == requests::kAll.size(), "a handler has no request");
 
+// Other requests end something, or only look.
+bool holdsMemory(const Method& method) {
+  return method.carriesMessage || method.name == requests::kCreateReportingSession.name ||
+         method.name == requests::kSetConfiguration.name ||
+         method.name == requests::kStartReportingSessionForID.name ||
+         method.name == requests::kWatchOpenMessages.name;
+}
+
 }  // namespace
 
 TWReportingServiceExport::TWReportingServiceExport(std::shared_ptr<TWReportingServiceProtocol> object,
@@ -203,9 +214,18 @@ bool TWReportingServiceExport::isUrgent(std::size_t method) {
          (!hasAskedToObserve_ || role_ == Role::kClient);
 }
 
+std::optional<ReplyError> TWReportingServiceExport::refuseWithoutMemory(const Method& method) {
+  if (!MemoryReserve::isShort() || !holdsMemory(method) || MemoryReserve::tryToRecover()) return std::nullopt;
+  account_->countRefusal(Resource::kUnfinishedBytes);
+  errorLog(TWReportingServiceDelegateCategory(), "memory is short: %s is refused", method.name);
+  return messagingError(kOverLimit, "the daemon has no memory for it");
+}
+
 void TWReportingServiceExport::handleMessage(std::size_t method, IncomingMessage& message, Reply reply,
                                              InFlightToken token) {
   if (const std::optional<ReplyError> error = takeRole(requests::kAll[method])) return reply(error);
+  if (const std::optional<ReplyError> error = refuseWithoutMemory(requests::kAll[method]))
+    return reply(error);
   object_->sendMessage(std::move(message.payload), message.category, message.type, message.reporterIDs,
                        {std::move(reply), std::move(token)});
 }
@@ -214,6 +234,8 @@ void TWReportingServiceExport::handleRequest(std::size_t method, Arguments argum
                                              InFlightToken token) {
   const WorkingFor scope(account_, lines_.get());
   if (const std::optional<ReplyError> error = takeRole(requests::kAll[method])) return reply(error);
+  if (const std::optional<ReplyError> error = refuseWithoutMemory(requests::kAll[method]))
+    return reply(error);
   Incoming incoming{std::move(arguments), std::move(reply), std::move(token)};
   kHandlers[kHandlerOf[method]].run({*object_, *watch_}, incoming);
 }

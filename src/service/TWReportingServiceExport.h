@@ -48,6 +48,8 @@ class TWReportingServiceExport final : public RequestHandler {
  private:
   enum class Role { kOpen, kClient, kOnlooker };
 
+  // Returns an error when memory is short and the method would hold more of it.
+  [[nodiscard]] std::optional<ReplyError> refuseWithoutMemory(const Method& method);
   // Gives the connection the role that the method needs. Returns an error when it already has the other role.
   [[nodiscard]] std::optional<ReplyError> takeRole(const Method& method);
 

@@ -20,6 +20,7 @@
 #include "monitor/TWReportingSystemMonitor.h"
 #include "platform/Heartbeat.h"
 #include "platform/Log.h"
+#include "platform/MemoryReserve.h"
 #include "platform/Platform.h"
 #include "platform/SinkStatus.h"
 #include "platform/TimerService.h"
@@ -327,6 +328,7 @@ int run() {
   std::signal(SIGPIPE, SIG_IGN);
   std::signal(SIGXFSZ, SIG_IGN);  // writing past the file size limit then fails instead of ending the process
   raiseDescriptorLimit();
+  static_cast<void>(MemoryReserve::putAside());  // without memory the daemon does not start anyway
 
   const Directories directories = Directories::fromEnvironment();
   LinuxPlatform linux(directories);

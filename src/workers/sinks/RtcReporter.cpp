@@ -2,10 +2,12 @@
 #include "workers/sinks/RtcReporter.h"
 
 #include <cassert>
+#include <new>
 #include <string_view>
 #include <utility>
 
 #include "platform/Log.h"
+#include "platform/MemoryReserve.h"
 #include "platform/TimerService.h"
 #include "session/StrandPool.h"
 #include "session/TWReportingContext.h"
@@ -176,9 +178,17 @@ void RtcReporter::sendSummary(const TWReportingSessionMessages& messages, AudioS
                               ReporterID reporterID) {
   assert(queue_->ownsThisThread());
   if (!linkReportSessionStarted_ || messages.empty()) return;
-  const TWReportingSessionMessage summary(
-      rtcSummaryOf(messages, serviceType, TWReportingSessionRtcWorker::kWorkerClass), kCategoryUnknown,
-      kTypeUnknown);
+  // It takes as much memory as all texts of the session, which may be what has made memory short.
+  ValueMap texts;
+  try {
+    if (MemoryReserve::isShort()) throw std::bad_alloc();
+    texts = rtcSummaryOf(messages, serviceType, TWReportingSessionRtcWorker::kWorkerClass);
+  } catch (const std::bad_alloc&) {
+    errorLog(TWReportingSessionLinkReportCategory(),
+             "memory is short: the rtc summary event is left out. reporterID=%lli", reporterID);
+    return;
+  }
+  const TWReportingSessionMessage summary(std::move(texts), kCategoryUnknown, kTypeUnknown);
   defaultLog(TWReportingSessionLinkReportCategory(), "sending rtc summary event. reporterID=%lli",
              reporterID);
   for (const ValueMap::Entry& entry : summary.message) {

@@ -8,6 +8,7 @@
 #include <unistd.h>
 #include <utility>
 
+#include "platform/MemoryReserve.h"
 #include "values/Mutex.h"
 
 namespace tonewerk {
@@ -27,7 +28,8 @@ std::size_t idleBytesOfTheProcess() {
   const std::size_t resident = residentBytes();
   if (resident <= AllocatorReclaimer::kMaxIdleBytes) return 0;  // cannot be above kMaxIdleBytes
   const struct mallinfo2 all = ::mallinfo2();
-  const std::size_t used = all.uordblks + all.hblkhd;
+  // The reserve is allocated, but not in RAM.
+  const std::size_t used = all.uordblks + all.hblkhd - MemoryReserve::unusedBytes();
   return resident - std::min(used, resident);
 }
 
