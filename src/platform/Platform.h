@@ -17,6 +17,7 @@ class Diagwire;
 class Energybook;
 class FileSystem;
 class IssueDraftService;
+class Journal;
 class JsonService;
 class Kolvi;
 class LinkReport;
@@ -62,6 +63,8 @@ struct Platform {
   Chanmeter& chanmeter;
   CommandRunner& commands;
   DetachedThreads& threads;
+  // Where requests are kept until their sessions have been reported; null to keep none.
+  Journal* journal = nullptr;
   // The directory for reports that people read; absolute.
   std::string logsDirectory = {};
   // The directory for files that are soon moved elsewhere; absolute.
