@@ -65,7 +65,10 @@ TEST_F(DefaultsCommandTest, ShowsWhatCountsAndWhereItIsFrom) {
   EXPECT_EQ(run({"defaults", "read", "com.orvane.tonewerk.store", "--json"}), kDone);
   EXPECT_EQ(output(),
             "{\"key\":\"max_megabytes\",\"from\":\"default\",\"value\":256}\n"
-            "{\"key\":\"max_days\",\"from\":\"default\",\"value\":30}\n");
+            "{\"key\":\"max_days\",\"from\":\"default\",\"value\":30}\n"
+            "{\"key\":\"journal_megabytes\",\"from\":\"default\",\"value\":64}\n"
+            "{\"key\":\"journal_sync_seconds\",\"from\":\"default\",\"value\":5}\n"
+            "{\"key\":\"journal_days\",\"from\":\"default\",\"value\":0}\n");
 }
 
 TEST_F(DefaultsCommandTest, AsksForTheNameThatIsClose) {
@@ -141,7 +144,7 @@ TEST_F(DefaultsCommandTest, WarnsOfWhatTheDaemonDoesNotReadOrKeepsItself) {
 TEST_F(DefaultsCommandTest, ShowsAConfiguredValueThatTheKeyCannotHaveWithAWarning) {
   configure("com.orvane.tonewerk.store", "max_days = \"soon\"\n");
   EXPECT_EQ(run({"defaults", "read", "com.orvane.tonewerk.store"}), kDone);
-  EXPECT_THAT(output(), HasSubstr("max_days       configuration  soon\n"));
+  EXPECT_THAT(output(), HasSubstr("max_days              configuration  soon\n"));
   EXPECT_EQ(errors(), "twctl: warning: max_days must be a number from 1, not \"soon\"\n");
 }
 
@@ -154,7 +157,16 @@ TEST_F(DefaultsCommandTest, DescribesThePreferencesThereAre) {
             "    default 256\n"
             "  max_days  number from 1\n"
             "    Age of the oldest report in days\n"
-            "    default 30\n");
+            "    default 30\n"
+            "  journal_megabytes  number from 0\n"
+            "    MiB of requests kept to outlive a crash\n"
+            "    default 64\n"
+            "  journal_sync_seconds  number from 0 to 3600\n"
+            "    Seconds until a request is on the disk\n"
+            "    default 5\n"
+            "  journal_days  number from 0\n"
+            "    Days that requests are kept for replay\n"
+            "    default 0\n");
   EXPECT_EQ(run({"defaults", "describe", "com.orvane.linkreport", "event_name_attribute"}), kDone);
   EXPECT_THAT(output(), HasSubstr("    default false\n"));
   EXPECT_EQ(run({"defaults", "describe", "com.orvane.tonewerk.captures"}), kDone);
