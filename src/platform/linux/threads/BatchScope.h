@@ -31,6 +31,10 @@ class BatchScope {
   // Defers `deferred` to the end of the calling thread's batch. False when the thread has no batch.
   [[nodiscard]] static bool defer(std::shared_ptr<Deferred> deferred);
 
+  // Defers `deferred`, of which there is one, before everything that is deferred otherwise. Again in the same
+  // batch it changes nothing. False when the thread has no batch.
+  [[nodiscard]] static bool deferFirst(const std::shared_ptr<Deferred>& deferred);
+
   // Call it after each piece of work. After kMaxPieces it ends the calling thread's batch and begins the next
   // one. Does nothing on a thread without a batch.
   static void pieceHasRun();
@@ -38,6 +42,7 @@ class BatchScope {
  private:
   void end();
 
+  std::shared_ptr<Deferred> first_;
   std::vector<std::shared_ptr<Deferred>> deferred_;
   std::size_t pieces_ = 0;
 };

@@ -3,6 +3,7 @@
 
 #include <gmock/gmock.h>
 #include <memory>
+#include <string>
 
 #include "platform/linux/threads/ThreadQueue.h"
 
@@ -32,6 +33,28 @@ TEST(BatchScopeTest, NothingIsDeferredOutsideABatch) {
   const auto counter = std::make_shared<Counter>();
   EXPECT_FALSE(BatchScope::defer(counter));
   EXPECT_EQ(counter.use_count(), 1);
+}
+
+TEST(BatchScopeTest, WhatIsDeferredFirstRunsBeforeTheRest) {
+  class Order final : public BatchScope::Deferred {
+   public:
+    Order(std::string& order, char name) : order_(order), name_(name) {}
+    void endOfBatch() override { order_ += name_; }
+
+   private:
+    std::string& order_;
+    const char name_;
+  };
+  std::string order;
+  const auto first = std::make_shared<Order>(order, 'a');
+  EXPECT_FALSE(BatchScope::deferFirst(first));
+  {
+    const BatchScope batch;
+    EXPECT_TRUE(BatchScope::defer(std::make_shared<Order>(order, 'b')));
+    EXPECT_TRUE(BatchScope::deferFirst(first));
+    EXPECT_TRUE(BatchScope::deferFirst(first));
+  }
+  EXPECT_EQ(order, "ab");
 }
 
 TEST(BatchScopeTest, EndsAfterTheLargestNumberOfPieces) {
