@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <functional>
 #include <memory>
+#include <optional>
 #include <string>
 
 #include "platform/RequestHandler.h"
@@ -29,6 +30,10 @@ class MessagingConnection {
   virtual std::uint32_t userIdentifier() const = 0;  // kNoUser when the kernel reports none
   // The account of the peer's user. It outlives the connection.
   virtual const std::shared_ptr<Account>& account() const = 0;
+
+  // The process's name, when the transport knows it: of a client that is gone, and whose requests are played
+  // again.
+  virtual std::optional<std::string> processName() const { return std::nullopt; }
 
   // For log lines.
   virtual std::string description() const = 0;

@@ -5,6 +5,7 @@
 #include <cstdint>
 #include <memory>
 #include <optional>
+#include <string_view>
 #include <utility>
 
 #include "protocol/IncomingMessage.h"
@@ -108,6 +109,11 @@ class RequestHandler {
   virtual void handleMessage(std::size_t method, IncomingMessage& message, Reply reply, InFlightToken token) {
     handleRequest(method, message.arguments(), std::move(reply), std::move(token));
   }
+
+  // The next call of handleRequest() or handleMessage() is for this frame, the bytes as they came. They are
+  // valid until that call returns. On the work queue. Neither a transport without frames calls it, nor is it
+  // called for urgent requests.
+  virtual void beginFrame(std::string_view /*frame*/) {}
 
   // Runs on the messaging thread: delivers the requests that are handled soon, or sees that another thread
   // delivers them, in the order of these calls. A transport that decodes on its own thread calls

@@ -96,6 +96,7 @@ void ReplyOutbox::takeGathered() {
 
 void ReplyOutbox::sendUnsent() {
   state_ = State::kOpen;
+  if (beforeSending_ && sent_ < unsent_.size()) beforeSending_();
   while (sent_ < unsent_.size() && state_ == State::kOpen) {
     const ssize_t count =
         ::send(socket_, unsent_.data() + sent_, unsent_.size() - sent_, MSG_DONTWAIT | MSG_NOSIGNAL);

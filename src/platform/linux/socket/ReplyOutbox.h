@@ -4,6 +4,7 @@
 #include <atomic>
 #include <cstddef>
 #include <cstdint>
+#include <functional>
 #include <memory>
 #include <string>
 
@@ -43,9 +44,12 @@ class ReplyOutbox final : public ReplySink,
     ~Gathering();
   };
 
-  // `socket` stays open until close(). The waker wakes the listener's thread for `connection`.
-  ReplyOutbox(int socket, std::shared_ptr<IoWaker> waker, std::uint64_t connection)
-      : socket_(socket), waker_(std::move(waker)), connection_(connection) {}
+  // `socket` stays open, and `beforeSending` lives, until close(). The waker wakes the listener's thread for
+  // `connection`. `beforeSending` is called on any thread before bytes are sent, unless it is empty: it does
+  // what must have happened before a client reads an answer, and uses no outbox.
+  ReplyOutbox(int socket, std::shared_ptr<IoWaker> waker, std::uint64_t connection,
+              const std::function<void()>& beforeSending)
+      : socket_(socket), waker_(std::move(waker)), connection_(connection), beforeSending_(beforeSending) {}
 
   // Any thread.
   void reply(std::uint32_t requestIdentifier, const std::optional<ReplyError>& error,
@@ -67,6 +71,7 @@ class ReplyOutbox final : public ReplySink,
   const int socket_;
   const std::shared_ptr<IoWaker> waker_;
   const std::uint64_t connection_;
+  const std::function<void()>& beforeSending_;
   std::atomic<std::size_t> unsentBytes_{0};
   std::string gathered_;  // used by the thread that gathers
   Mutex mutex_;

@@ -38,7 +38,8 @@ UnixConnection::UnixConnection(const UnixConnectionContext& context, UserIntake&
       readCharge_(intake.account, Resource::kReadBytes, 0),
       replyCharge_(intake.account, Resource::kUnfinishedBytes, 0),
       window_(std::make_shared<RequestWindow>(context.waker, identifier)),
-      outbox_(std::make_shared<ReplyOutbox>(socket_.get(), context.waker, identifier)) {}
+      outbox_(
+          std::make_shared<ReplyOutbox>(socket_.get(), context.waker, identifier, context.beforeReplies)) {}
 
 UnixConnection::~UnixConnection() {
   outbox_->close();

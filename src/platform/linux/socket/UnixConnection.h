@@ -37,6 +37,8 @@ struct UnixConnectionContext {
   AllocatorReclaimer* memory;
   // Connections that are to be woken after a while, because their users had no room.
   std::vector<std::uint64_t>& waiting;
+  // See ReplyOutbox.
+  const std::function<void()>& beforeReplies;
 };
 
 // The process at the other end of a socket, as the kernel reports it.

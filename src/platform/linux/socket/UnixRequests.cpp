@@ -93,7 +93,10 @@ bool UnixRequests::deliverNext(RpcFrameDecoder& decoder, ShapeTable* shapes, Wan
   if (shapes != nullptr && request.method && context_->methods.methods[*request.method].carriesMessage) {
     if (IncomingMessage* message = decoder.decodeMessage(request.frame, *shapes)) {
       const bool isTaken = wanted == Wanted::kAll || handler.isQuick(*request.method, message);
-      if (isTaken) handler.handleMessage(*request.method, *message, replyTo(request), takeNext());
+      if (isTaken) {
+        handler.beginFrame(request.frame.bytes);
+        handler.handleMessage(*request.method, *message, replyTo(request), takeNext());
+      }
       decoder.releaseMessage();
       if (isTaken) BatchScope::pieceHasRun();
       return isTaken;
@@ -107,6 +110,7 @@ bool UnixRequests::deliverNext(RpcFrameDecoder& decoder, ShapeTable* shapes, Wan
     const InFlightToken token = takeNext();
     replyTo(request)(problem);
   } else {
+    if (shapes != nullptr) handler.beginFrame(request.frame.bytes);
     handler.handleRequest(*request.method, std::move(frame.arguments), replyTo(request), takeNext());
   }
   BatchScope::pieceHasRun();

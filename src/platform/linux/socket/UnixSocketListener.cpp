@@ -37,11 +37,12 @@ std::size_t descriptorsForClients() {
 
 UnixSocketListener::UnixSocketListener(std::unique_ptr<ServerSocket> socket, const LogCategory& log,
                                        Accounts& accounts, std::unique_ptr<WatchdogFeeder> watchdog,
-                                       AllocatorReclaimer* memory)
+                                       AllocatorReclaimer* memory, std::function<void()> beforeReplies)
     : socket_(std::move(socket)),
       log_(log),
       accounts_(accounts),
-      context_{epoll_, waker_, std::make_shared<RpcFrameDecoder>(), log_, memory, waiting_},
+      beforeReplies_(std::move(beforeReplies)),
+      context_{epoll_, waker_, std::make_shared<RpcFrameDecoder>(), log_, memory, waiting_, beforeReplies_},
       watchdog_(std::move(watchdog)),
       maxConnections_(descriptorsForClients()) {
   accounts_.totals().setTotal(Resource::kConnections, maxConnections_);

@@ -6,6 +6,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <deque>
+#include <functional>
 #include <memory>
 #include <optional>
 #include <thread>
@@ -43,10 +44,10 @@ class UnixSocketListener final : public MessagingListener {
 
   // `log`, `accounts` and `memory` outlive the listener. The messaging thread feeds `watchdog`; without one
   // it wakes up only for clients. `memory` learns how many bytes clients send and when a client is gone. It
-  // may be null.
+  // may be null. `beforeReplies` is called on any thread before answers are sent.
   UnixSocketListener(std::unique_ptr<ServerSocket> socket, const LogCategory& log, Accounts& accounts,
-                     std::unique_ptr<WatchdogFeeder> watchdog = nullptr,
-                     AllocatorReclaimer* memory = nullptr);
+                     std::unique_ptr<WatchdogFeeder> watchdog = nullptr, AllocatorReclaimer* memory = nullptr,
+                     std::function<void()> beforeReplies = {});
   ~UnixSocketListener() override;
 
   void setDelegate(MessagingListenerDelegate& delegate) override { delegate_ = &delegate; }
@@ -104,6 +105,7 @@ class UnixSocketListener final : public MessagingListener {
   Accounts& accounts_;
   std::vector<std::uint64_t> waiting_;  // connections whose users had no room
   std::optional<std::chrono::steady_clock::time_point> wakeWaitingAt_;
+  const std::function<void()> beforeReplies_;
   const UnixConnectionContext context_;
   // Of the users that have connections.
   std::unordered_map<const Account*, std::unique_ptr<UserIntake>> intakes_;

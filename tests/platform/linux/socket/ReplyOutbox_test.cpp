@@ -28,7 +28,7 @@ class ReplyOutboxTest : public testing::Test {
     EXPECT_EQ(::socketpair(AF_UNIX, SOCK_STREAM | SOCK_NONBLOCK | SOCK_CLOEXEC, 0, ends.data()), 0);
     own_ = FileDescriptor(ends[0]);
     peer_ = FileDescriptor(ends[1]);
-    outbox = std::make_shared<ReplyOutbox>(own_.get(), std::make_shared<IoWaker>(), 1);
+    outbox = std::make_shared<ReplyOutbox>(own_.get(), std::make_shared<IoWaker>(), 1, beforeSending);
   }
 
   void reply(std::uint32_t identifier) { outbox->reply(identifier, std::nullopt, std::nullopt); }
@@ -45,8 +45,22 @@ class ReplyOutboxTest : public testing::Test {
   FileDescriptor peer_;
 
  protected:
+  std::function<void()> beforeSending;
   std::shared_ptr<ReplyOutbox> outbox;
 };
+
+TEST_F(ReplyOutboxTest, CallsWhatMustHappenBeforeBytesAreSent) {
+  int calls = 0;
+  std::string alreadySent = "not looked at";
+  beforeSending = [&] {
+    ++calls;
+    alreadySent = received();
+  };
+  reply(1);
+  EXPECT_EQ(calls, 1);
+  EXPECT_EQ(alreadySent, "");
+  EXPECT_EQ(received(), answerTo(1));
+}
 
 TEST_F(ReplyOutboxTest, SendsAtTheEndOfTheBatchWhatTheThreadHasGathered) {
   {
