@@ -37,7 +37,10 @@ TWReportingContext::LogCategories::LogCategories(Log& log)
 
 TWReportingContext::TWReportingContext(const Platform& platform,
                                        std::vector<const TWReportingSessionWorkerClass*> workerClasses)
-    : logCategories(platform.log), platform_(platform), workerClasses_(std::move(workerClasses)) {
+    : logCategories(platform.log),
+      platform_(platform),
+      journal_(platform.journal, platform.clock),
+      workerClasses_(std::move(workerClasses)) {
   [[maybe_unused]] TWReportingContext* before = currentContext.exchange(this);
   assert(before == nullptr);
 }

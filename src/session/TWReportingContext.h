@@ -15,6 +15,7 @@
 #include "platform/SerialQueue.h"
 #include "platform/SinkStatus.h"
 #include "protocol/AudioEvent.h"
+#include "session/RequestJournal.h"
 #include "session/SingletonRegistry.h"
 #include "session/SinkQueue.h"
 #include "session/StrandPool.h"
@@ -85,6 +86,9 @@ class TWReportingContext {
     return names_;
   }
 
+  // On the work queue.
+  RequestJournal& journal() { return journal_; }
+
   // The numbers of the base categories and of the types, by their texts.
   using Lookup = std::unordered_map<std::string, std::uint32_t>;
   const Lookup& categoryLookup();
@@ -108,6 +112,7 @@ class TWReportingContext {
 
  private:
   const Platform platform_;
+  RequestJournal journal_;
   TWReportingNameTable names_;
   SingletonRegistry singletons_;
   SinkList sinks_;

@@ -95,6 +95,7 @@ struct TestPlatform {
             .chanmeter = chanmeter,
             .commands = commands,
             .threads = threads,
+            .journal = journal,
             .logsDirectory = "/logs",
             .temporaryDirectory = "/tmp"};
   }
@@ -126,6 +127,7 @@ struct TestPlatform {
   MemoryChanmeter chanmeter;
   MemoryCommandRunner commands;
   MemoryDetachedThreads threads;
+  Journal* journal = nullptr;
 };
 
 }  // namespace tonewerk
