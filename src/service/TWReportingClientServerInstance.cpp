@@ -48,7 +48,8 @@ TWReportingClientServerInstance::TWReportingClientServerInstance(
       account_(std::move(account)),
       delegate_(std::move(delegate)),
       budget_(std::make_shared<KeptBytesBudget>(account_)),
-      shapes_(makeMessageShapes()) {
+      shapes_(makeMessageShapes()),
+      journalClient_{.process = processIdentifier, .user = account_->user()} {
   infoLog(category(), "new client with pid %lu", processIdentifier);
 }
 
@@ -87,6 +88,8 @@ void TWReportingClientServerInstance::createReportingSession(ReporterID reporter
     if (!session->takeOwnBytes()) return reply(overBudget(*self.budget_));
     session->setClientProcessName(self.clientProcessName());
     self.setSession(reporterID, session);
+    TWReportingContext::current().journal().opened(self.journalClient_, reporterID,
+                                                   self.lastConnectionRecord_);
     infoLog(category(), "session created for reporter %lli", reporterID);
     reply(std::nullopt, true);
   });
@@ -208,6 +211,7 @@ struct TWReportingClientServerInstance::Delivery {
   ServiceRequest request;
   std::size_t bytes;  // of the message
   Charge charge;      // for the sessions that are still to get it
+  JournalPosition position = JournalPosition::current();
   std::size_t next = 0;
 
   void send(const Session& session, ValueMap payload) const {
@@ -218,6 +222,7 @@ struct TWReportingClientServerInstance::Delivery {
 
   // Sends to the next sessions until the user's turn is over.
   TurnQueue::Progress run(const TurnQueue& turns) {
+    const JournalPosition::Scope scope(position);
     while (next < sessions.size()) {
       if (turns.mustGiveUp()) {
         errorLog(category(),
@@ -346,6 +351,35 @@ void TWReportingClientServerInstance::expectMessage(ReporterID reporterID) {
   if (index_ != nullptr) index_->expect(reporterID);
 }
 
+bool TWReportingClientServerInstance::isKept(const Method& method) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
+  RequestJournal& journal = TWReportingContext::current().journal();
+  if (!journal.isOn()) return false;
+  if (method.carriesMessage) {
+    const Delegate delegate = delegate_.lock();
+    if (delegate == nullptr || !delegate->isReportingEnabled()) return false;
+  }
+  const bool beginsSession = method.name == requests::kCreateReportingSession.name;
+  if (journalClient_.number == 0 || beginsSession ||
+      lastConnectionRecord_ < journal.connectionsNeededFrom()) {
+    lastConnectionRecord_ = journal.keepConnection(journalClient_, clientProcessName());
+  }
+  return true;
+}
+
+JournalPosition TWReportingClientServerInstance::keepFrame(const Method& method, std::string_view frame) {
+  if (!isKept(method)) return JournalPosition();
+  RequestJournal& journal = TWReportingContext::current().journal();
+  return journal.position(journal.keep(journalClient_, frame));
+}
+
+JournalPosition TWReportingClientServerInstance::keepValues(const Method& method,
+                                                            const Arguments& arguments) {
+  if (!isKept(method)) return JournalPosition();
+  RequestJournal& journal = TWReportingContext::current().journal();
+  return journal.position(journal.keep(journalClient_, method.name, arguments));
+}
+
 void TWReportingClientServerInstance::killService() {
   defaultLog(category(), "DESTROYING SERVICE");
   if (const Delegate delegate = delegate_.lock()) delegate->endProcess();
@@ -382,12 +416,18 @@ TWReportingClientServerInstance::Session TWReportingClientServerInstance::makeSe
 // One session after the other, because a stop may take long and other users wait.
 void TWReportingClientServerInstance::handleConnectionError() {
   TurnQueue& turns = TWReportingContext::current().turns();
-  turns.add(account_, [self = shared_from_this(), &turns, last = std::optional<ReporterID>()]() mutable {
+  auto end = [self = shared_from_this(), &turns, last = std::optional<ReporterID>(),
+              position = std::optional<JournalPosition>()]() mutable {
     using Progress = TurnQueue::Progress;
     const Delegate delegate = self->delegate_.lock();
     if (delegate == nullptr) return Progress::kDone;
     const auto& clients = delegate->getAllClients();
     if (std::find(clients.begin(), clients.end(), self) == clients.end()) return Progress::kDone;
+    if (!position) {
+      RequestJournal& journal = TWReportingContext::current().journal();
+      position = journal.position(journal.keepEnd(self->journalClient_));
+    }
+    const JournalPosition::Scope scope(*position);
     SessionMap& sessions = self->clientReportingSessionMap_;
     for (auto at = last ? sessions.upper_bound(*last) : sessions.begin(); at != sessions.end(); ++at) {
       last = at->first;
@@ -402,7 +442,8 @@ void TWReportingClientServerInstance::handleConnectionError() {
     logLine(self->connectionLogLevel(), category(), "removing %i from the server client list",
             self->processIdentifier_);
     return Progress::kDone;
-  });
+  };
+  turns.run(account_, std::move(end));
 }
 
 void TWReportingClientServerInstance::listSessionsIn(std::shared_ptr<SessionIndex> index,
@@ -420,6 +461,7 @@ void TWReportingClientServerInstance::setSession(ReporterID reporterID, Session 
 
 void TWReportingClientServerInstance::removeSession(ReporterID reporterID) {
   if (index_ != nullptr) index_->remove(reporterID, number_);
+  TWReportingContext::current().journal().closed(journalClient_, reporterID);
   clientReportingSessionMap_.erase(reporterID);
 }
 

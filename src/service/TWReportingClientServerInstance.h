@@ -8,12 +8,14 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <string_view>
 
 #include "platform/Log.h"
 #include "protocol/AudioEvent.h"
 #include "service/SessionIndex.h"
 #include "service/TWReportingServiceProtocol.h"
 #include "session/KeptBytesBudget.h"
+#include "session/RequestJournal.h"
 #include "values/Mutex.h"
 
 namespace tonewerk {
@@ -59,6 +61,8 @@ class TWReportingClientServerInstance final
   void reporterIDValid(ReporterID reporterID, ServiceRequest request) override;
   void getAllReporters(ServiceRequest request) override;
   void expectMessage(ReporterID reporterID) override;
+  JournalPosition keepFrame(const Method& method, std::string_view frame) override;
+  JournalPosition keepValues(const Method& method, const Arguments& arguments) override;
   void killService() override;
   void observe(ServiceRequest request) override;
 
@@ -109,6 +113,9 @@ class TWReportingClientServerInstance final
   template <typename Body>
   void onWorkQueue(ServiceRequest request, Body body);
 
+  // Whether requests of the method are kept in the journal. If so, the client is known there.
+  [[nodiscard]] bool isKept(const Method& method);
+
   // The level of the log lines about the client's connection. An onlooker's are for debugging only.
   LogLevel connectionLogLevel() const { return isOnlooker_ ? LogLevel::kDebug : LogLevel::kInfo; }
   Session ownSession(ReporterID reporterID) const;
@@ -127,6 +134,8 @@ class TWReportingClientServerInstance final
   std::shared_ptr<SessionIndex> index_;  // null until the service has registered the client
   SessionIndex::ClientNumber number_ = 0;
   std::atomic<bool> isOnlooker_ = false;
+  RequestJournal::Client journalClient_;    // used on the work queue
+  std::uint64_t lastConnectionRecord_ = 0;  // in the journal; used on the work queue
 
   mutable Mutex mutex_;
   std::optional<double> clientStartDate_ GUARDED_BY(mutex_);

@@ -33,6 +33,11 @@ constexpr std::chrono::milliseconds kReaperInterval{500};
 
 const auto category = &TWReportingServiceDelegateCategory;
 
+// While the journal is played, requests for sessions may be left whose beginning is not in it any more.
+LogLevel unknownSessionLevel() {
+  return TWReportingContext::current().journal().isPlaying() ? LogLevel::kDebug : LogLevel::kError;
+}
+
 double now() { return TWReportingContext::current().platform().clock.now(); }
 std::chrono::nanoseconds monotonic() { return TWReportingContext::current().platform().clock.monotonic(); }
 
@@ -59,12 +64,13 @@ bool TWReportingService::listenerShouldAcceptNewConnection(MessagingConnection& 
                                                                     weak_from_this());
     weakClient = client;
     // Comes before all requests of the client, because it is the same user's work.
-    TWReportingContext::current().turns().add(client->account(), [this, self = weak_from_this(), weakClient] {
-      const auto service = self.lock();
-      const auto listed = weakClient.lock();
-      if (service != nullptr && listed != nullptr) registerClient(listed);
-      return TurnQueue::Progress::kDone;
-    });
+    TWReportingContext::current().turns().run(
+        client->account(), [this, self = weak_from_this(), weakClient, name = connection.processName()] {
+          const auto service = self.lock();
+          const auto listed = weakClient.lock();
+          if (service != nullptr && listed != nullptr) registerClient(listed, name);
+          return TurnQueue::Progress::kDone;
+        });
     std::shared_ptr<ShapeTable> shapes = client->shapes();
     connection.setRequestHandler(
         requests::all(),
@@ -96,12 +102,13 @@ MessageTap& TWReportingService::messageTap() {
   return messageTap_;
 }
 
-void TWReportingService::registerClient(const Client& client) {
+void TWReportingService::registerClient(const Client& client, const std::optional<std::string>& name) {
   clients_.push_back(client);
   client->listSessionsIn(directory_.indexOf(client->account()->user()), ++lastClientNumber_);
   client->setClientStartDate(now());
   client->setClientProcessName(
-      TWReportingContext::current().platform().processes.processName(client->processIdentifier()));
+      name ? name
+           : TWReportingContext::current().platform().processes.processName(client->processIdentifier()));
 }
 
 void TWReportingService::reportClientUptime(
@@ -123,7 +130,7 @@ TWReportingService::Session TWReportingService::findReportingSessionForID(Report
   if (reporterID == 0 || !reportingEnabled_) return nullptr;
   Session session = directory_.find(reporterID, requester);
   if (session == nullptr) {
-    errorLog(category(), "failed to find reporting session %lli", reporterID);
+    logLine(unknownSessionLevel(), category(), "failed to find reporting session %lli", reporterID);
     return nullptr;
   }
   infoLog(category(), "found reporting session %lli for client %i", reporterID,
@@ -172,9 +179,10 @@ std::vector<TWReportingService::Session> TWReportingService::findSessions(
     }
   }
   if (firstUnknown && others > 0) {
-    errorLog(category(), "failed to find reporting session %lli and %zu others", *firstUnknown, others);
+    logLine(unknownSessionLevel(), category(), "failed to find reporting session %lli and %zu others",
+            *firstUnknown, others);
   } else if (firstUnknown) {
-    errorLog(category(), "failed to find reporting session %lli", *firstUnknown);
+    logLine(unknownSessionLevel(), category(), "failed to find reporting session %lli", *firstUnknown);
   }
   return found;
 }
@@ -195,9 +203,12 @@ TWReportingService::Session TWReportingService::singleMessageSession(const std::
   if (single.session == nullptr) {
     infoLog(category(), "Creating singleMessageSession");
     single.account = user;
+    single.firstRecord = JournalPosition::current().sequence();
+    TWReportingContext::current().journal().openedSingleMessages(user->user(), single.firstRecord);
     single.session = makeSingleMessageSession(user);
   }
-  if (singleMessageSessionReaper_ == nullptr) {
+  // While the journal is played, its records say when the session ends.
+  if (singleMessageSessionReaper_ == nullptr && !TWReportingContext::current().journal().isPlaying()) {
     singleMessageSessionReaper_ =
         TWReportingContext::current().platform().timers.repeat(kReaperInterval, [self = weak_from_this()] {
           if (const auto service = self.lock()) service->_reapSingleMessageSession();
@@ -243,13 +254,37 @@ void TWReportingService::_reapSingleMessageSession() {
     infoLog(category(), "Stopping singleMessageSession after timeout=%f",
             kSingleMessageSessionTimeoutSeconds);
     // Queued under the lock, so that a thread that finds no session knows that its stop is already queued.
-    TWReportingContext::current().turns().add(at->second.account, [session = std::move(at->second.session)] {
-      session->stop();
+    const std::shared_ptr<Account> account = at->second.account;
+    TWReportingContext::current().turns().add(account, [single = std::move(at->second)] {
+      stopSingleMessageSession(single);
       return TurnQueue::Progress::kDone;
     });
     at = singleMessages_.erase(at);
   }
   if (singleMessages_.empty()) singleMessageSessionReaper_.reset();
+}
+
+void TWReportingService::stopSingleMessageSession(const SingleMessage& single) {
+  RequestJournal& journal = TWReportingContext::current().journal();
+  const std::uint32_t user = single.account->user();
+  JournalPosition position = journal.position(journal.keepEndOfSingleMessages(user));
+  const JournalPosition::Scope scope(position);
+  single.session->stop();
+  journal.closedSingleMessages(user, single.firstRecord);
+}
+
+void TWReportingService::stopSingleMessageSession(std::uint32_t user) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
+  SingleMessage taken;
+  {
+    const MutexLock lock(singleMessageMutex_);
+    const auto found = singleMessages_.find(user);
+    if (found == singleMessages_.end()) return;
+    taken = std::move(found->second);
+    singleMessages_.erase(found);
+  }
+  const WorkingFor scope(taken.account);
+  stopSingleMessageSession(taken);
 }
 
 void TWReportingService::stopSingleMessageSessions() {
@@ -262,7 +297,7 @@ void TWReportingService::stopSingleMessageSessions() {
   }
   for (const auto& [user, single] : taken) {
     const WorkingFor scope(single.account);
-    single.session->stop();
+    stopSingleMessageSession(single);
   }
 }
 

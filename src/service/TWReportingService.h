@@ -61,10 +61,14 @@ class TWReportingService final : public MessagingListenerDelegate,
   // Stops the single-message sessions. Called at the daemon's end, on the work queue.
   void stopSingleMessageSessions();
 
+  // Stops that of one user, if there is one. On the work queue.
+  void stopSingleMessageSession(std::uint32_t user);
+
   void setReportingEnabled(bool enabled) { reportingEnabled_ = enabled; }
 
  private:
-  void registerClient(const Client& client);
+  // `name` of the process; none to ask the system.
+  void registerClient(const Client& client, const std::optional<std::string>& name);
   void reportClientUptime(std::int32_t processIdentifier,
                           const std::weak_ptr<TWReportingClientServerInstance>& client);
   std::vector<Session> findSessions(const std::vector<ReporterID>& reporterIDs, const Account& requester);
@@ -84,7 +88,11 @@ class TWReportingService final : public MessagingListenerDelegate,
     std::shared_ptr<Account> account;
     Session session;
     std::chrono::nanoseconds lastRetrieved{0};  // in monotonic time, because the wall clock can jump
+    std::uint64_t firstRecord = 0;              // in the journal; 0 when there is none
   };
+  // On the work queue.
+  static void stopSingleMessageSession(const SingleMessage& single);
+
   mutable Mutex singleMessageMutex_;
   // By user. A user has none while its messages go to other sessions.
   std::map<std::uint32_t, SingleMessage> singleMessages_ GUARDED_BY(singleMessageMutex_);

@@ -43,16 +43,7 @@ struct Targets {
   WatchRequests& watch;
 };
 
-// A request without its method. A handler moves the members out.
-struct Incoming {
-  Arguments arguments;
-  Reply reply;
-  InFlightToken token;
-
-  ServiceRequest request() { return {std::move(reply), std::move(token)}; }
-};
-
-void sendMessage(const Targets& to, Incoming& in) {
+void sendMessage(const Targets& to, IncomingRequest& in) {
   ValueMap message = *in.arguments[0]->asMap();
   const auto category = static_cast<AudioEventCategory>(in.arguments[1]->integer());
   const auto type = static_cast<AudioEventType>(in.arguments[2]->integer());
@@ -64,60 +55,62 @@ void sendMessage(const Targets& to, Incoming& in) {
 
 struct Handler {
   std::string_view name;
-  void (*run)(const Targets& to, Incoming& in);
+  void (*run)(const Targets& to, IncomingRequest& in);
 };
 
 constexpr Handler kHandlers[] = {
     {requests::kCreateReportingSession.name,
-     [](const Targets& to, Incoming& in) {
+     [](const Targets& to, IncomingRequest& in) {
        to.service.createReportingSession(reporterIDOf(in.arguments[0]), in.request());
      }},
     {requests::kSetServiceType.name,
-     [](const Targets& to, Incoming& in) {
+     [](const Targets& to, IncomingRequest& in) {
        to.service.setServiceType(serviceTypeOf(in.arguments[0]), reporterIDOf(in.arguments[1]), in.request());
      }},
     {requests::kGetServiceNameForReporterID.name,
-     [](const Targets& to, Incoming& in) {
+     [](const Targets& to, IncomingRequest& in) {
        to.service.getServiceNameForReporterID(reporterIDOf(in.arguments[0]), in.request());
      }},
     {requests::kSetConfiguration.name,
-     [](const Targets& to, Incoming& in) {
+     [](const Targets& to, IncomingRequest& in) {
        to.service.setConfiguration(*in.arguments[0]->asMap(), reporterIDOf(in.arguments[1]), in.request());
      }},
     {requests::kStartReportingSessionForID.name,
-     [](const Targets& to, Incoming& in) {
+     [](const Targets& to, IncomingRequest& in) {
        to.service.startReportingSessionForID(reporterIDOf(in.arguments[0]), in.request());
      }},
     {requests::kSendMessage.name, sendMessage},
     {requests::kStopReportingSessionForID.name,
-     [](const Targets& to, Incoming& in) {
+     [](const Targets& to, IncomingRequest& in) {
        to.service.stopReportingSessionForID(reporterIDOf(in.arguments[0]), in.request());
      }},
     {requests::kDestroyReportingSession.name,
-     [](const Targets& to, Incoming& in) {
+     [](const Targets& to, IncomingRequest& in) {
        to.service.destroyReportingSession(reporterIDOf(in.arguments[0]), in.request());
      }},
     {requests::kReporterIDValid.name,
-     [](const Targets& to, Incoming& in) {
+     [](const Targets& to, IncomingRequest& in) {
        to.service.reporterIDValid(reporterIDOf(in.arguments[0]), in.request());
      }},
     {requests::kGetAllReporters.name,
-     [](const Targets& to, Incoming& in) { to.service.getAllReporters(in.request()); }},
-    {requests::kKillService.name, [](const Targets& to, Incoming&) { to.service.killService(); }},
-    {requests::kObserve.name, [](const Targets& to, Incoming& in) { to.service.observe(in.request()); }},
+     [](const Targets& to, IncomingRequest& in) { to.service.getAllReporters(in.request()); }},
+    {requests::kKillService.name, [](const Targets& to, IncomingRequest&) { to.service.killService(); }},
+    {requests::kObserve.name,
+     [](const Targets& to, IncomingRequest& in) { to.service.observe(in.request()); }},
     {requests::kWatchSessions.name,
-     [](const Targets& to, Incoming& in) {
+     [](const Targets& to, IncomingRequest& in) {
        to.watch.sessions(in.arguments, std::move(in.reply), std::move(in.token));
      }},
     {requests::kWatchOpenMessages.name,
-     [](const Targets& to, Incoming& in) {
+     [](const Targets& to, IncomingRequest& in) {
        to.watch.openMessages(in.arguments, std::move(in.reply), std::move(in.token));
      }},
     {requests::kWatchNextMessages.name,
-     [](const Targets& to, Incoming& in) {
+     [](const Targets& to, IncomingRequest& in) {
        to.watch.nextMessages(std::move(in.reply), std::move(in.token));
      }},
-    {requests::kWatchAccounts.name, [](const Targets& to, Incoming& in) { to.watch.accounts(in.reply); }},
+    {requests::kWatchAccounts.name,
+     [](const Targets& to, IncomingRequest& in) { to.watch.accounts(in.reply); }},
 };
 
 constexpr std::size_t kNoHandler = std::size(kHandlers);
@@ -223,9 +216,13 @@ std::optional<ReplyError> TWReportingServiceExport::refuseWithoutMemory(const Me
 
 void TWReportingServiceExport::handleMessage(std::size_t method, IncomingMessage& message, Reply reply,
                                              InFlightToken token) {
-  if (const std::optional<ReplyError> error = takeRole(requests::kAll[method])) return reply(error);
-  if (const std::optional<ReplyError> error = refuseWithoutMemory(requests::kAll[method]))
-    return reply(error);
+  const std::string_view frame = std::exchange(frame_, {});
+  const Method& called = requests::kAll[method];
+  if (const std::optional<ReplyError> error = takeRole(called)) return reply(error);
+  if (const std::optional<ReplyError> error = refuseWithoutMemory(called)) return reply(error);
+  JournalPosition position =
+      frame.empty() ? object_->keepValues(called, message.arguments()) : object_->keepFrame(called, frame);
+  const JournalPosition::Scope scope(position);
   object_->sendMessage(std::move(message.payload), message.category, message.type, message.reporterIDs,
                        {std::move(reply), std::move(token)});
 }
@@ -233,10 +230,31 @@ void TWReportingServiceExport::handleMessage(std::size_t method, IncomingMessage
 void TWReportingServiceExport::handleRequest(std::size_t method, Arguments arguments, Reply reply,
                                              InFlightToken token) {
   const WorkingFor scope(account_, lines_.get());
-  if (const std::optional<ReplyError> error = takeRole(requests::kAll[method])) return reply(error);
-  if (const std::optional<ReplyError> error = refuseWithoutMemory(requests::kAll[method]))
-    return reply(error);
-  Incoming incoming{std::move(arguments), std::move(reply), std::move(token)};
+  const bool isOnQueue = TWReportingUtilityGetReportingServerQueue().isCurrent();
+  const std::string_view frame = isOnQueue ? std::exchange(frame_, {}) : std::string_view();
+  const Method& called = requests::kAll[method];
+  if (const std::optional<ReplyError> error = takeRole(called)) return reply(error);
+  if (const std::optional<ReplyError> error = refuseWithoutMemory(called)) return reply(error);
+  IncomingRequest incoming{std::move(arguments), std::move(reply), std::move(token)};
+  if (!isKept(called)) return kHandlers[kHandlerOf[method]].run({*object_, *watch_}, incoming);
+  if (isOnQueue) return keepAndRun(method, frame, incoming);
+  turns_.add(account_, [self = shared_from_this(), method, incoming = std::move(incoming)]() mutable {
+    const WorkingFor forUser(self->account_, self->lines_.get());
+    self->keepAndRun(method, {}, incoming);
+    return TurnQueue::Progress::kDone;
+  });
+}
+
+bool TWReportingServiceExport::isKept(const Method& method) {
+  return method.changesState && method.name != requests::kKillService.name;
+}
+
+void TWReportingServiceExport::keepAndRun(std::size_t method, std::string_view frame,
+                                          IncomingRequest& incoming) {
+  const Method& called = requests::kAll[method];
+  JournalPosition position =
+      frame.empty() ? object_->keepValues(called, incoming.arguments) : object_->keepFrame(called, frame);
+  const JournalPosition::Scope scope(position);
   kHandlers[kHandlerOf[method]].run({*object_, *watch_}, incoming);
 }
 

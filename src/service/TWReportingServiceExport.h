@@ -5,6 +5,7 @@
 #include <cstddef>
 #include <memory>
 #include <optional>
+#include <string_view>
 
 #include "platform/RequestHandler.h"
 #include "platform/accounts/TurnQueue.h"
@@ -14,12 +15,22 @@ namespace tonewerk {
 
 class WatchRequests;
 
+// A request without its method. A handler moves the members out.
+struct IncomingRequest {
+  Arguments arguments;
+  Reply reply;
+  InFlightToken token;
+
+  ServiceRequest request() { return {std::move(reply), std::move(token)}; }
+};
+
 // Takes each request of one connection to its handler, which turns the request's values into a call of the
 // request set or of `watch`.
 //
 // A connection becomes a client or an onlooker with its first request that decides it, and stays so. An
 // onlooker's requests that change something are refused, and so is a client's request to be an onlooker.
-class TWReportingServiceExport final : public RequestHandler {
+class TWReportingServiceExport final : public RequestHandler,
+                                       public std::enable_shared_from_this<TWReportingServiceExport> {
  public:
   // The connection's work is done in turns of `account`, that of its user. Maps among the arguments get their
   // shapes from `shapes`; they are trees without it.
@@ -28,6 +39,7 @@ class TWReportingServiceExport final : public RequestHandler {
                            std::shared_ptr<ShapeTable> shapes = nullptr);
   ~TWReportingServiceExport() override;
 
+  void beginFrame(std::string_view frame) override { frame_ = frame; }
   // `method`: the index in requests::all(). Runs on the work queue or, for transports that decode themselves
   // and for urgent requests, on the messaging thread.
   void handleRequest(std::size_t method, Arguments arguments, Reply reply, InFlightToken token) override;
@@ -53,7 +65,12 @@ class TWReportingServiceExport final : public RequestHandler {
   // Gives the connection the role that the method needs. Returns an error when it already has the other role.
   [[nodiscard]] std::optional<ReplyError> takeRole(const Method& method);
 
+  // Whether requests of the method are kept in the journal, and so run on the work queue.
+  static bool isKept(const Method& method);
+  void keepAndRun(std::size_t method, std::string_view frame, IncomingRequest& incoming);
+
   std::atomic<Role> role_ = Role::kOpen;
+  std::string_view frame_;  // of the request that comes next; empty when it has none; used on the work queue
   bool hasAskedToObserve_ = false;  // used on the messaging thread
   const std::shared_ptr<TWReportingServiceProtocol> object_;
   const std::unique_ptr<WatchRequests> watch_;

@@ -2,8 +2,10 @@
 #pragma once
 
 #include <optional>
+#include <string_view>
 #include <vector>
 
+#include "platform/JournalPosition.h"
 #include "platform/RequestHandler.h"
 #include "protocol/AudioEvent.h"
 #include "values/Value.h"
@@ -43,6 +45,14 @@ class TWReportingServiceProtocol {
   virtual void getAllReporters(ServiceRequest request) = 0;
   // A message for this session comes soon (see RequestHandler). On the work queue.
   virtual void expectMessage(ReporterID /*reporterID*/) {}
+  // Keep a request that is to run next in the journal, as a frame or as its values, and return its place
+  // there. On the work queue.
+  virtual JournalPosition keepFrame(const Method& /*method*/, std::string_view /*frame*/) {
+    return JournalPosition();
+  }
+  virtual JournalPosition keepValues(const Method& /*method*/, const Arguments& /*arguments*/) {
+    return JournalPosition();
+  }
   // Ends the process. The request is never answered.
   virtual void killService() = 0;
   // Makes the connection an onlooker: it may change nothing, and how long it lasted is not reported.

@@ -30,6 +30,13 @@ void TurnQueue::add(const std::shared_ptr<Account>& account, Piece piece) {
   setReady(lane);
 }
 
+void TurnQueue::run(const std::shared_ptr<Account>& account, Piece piece) {
+  if (!queue_.isCurrent() || running_ != nullptr) return add(account, std::move(piece));
+  const WorkingFor scope(account);
+  while (piece() == Progress::kMore) {
+  }
+}
+
 void TurnQueue::setReady(Lane& lane) {
   lane.state = Lane::State::kReady;
   ready_.push_back(&lane);

@@ -60,6 +60,10 @@ class TurnQueue : public std::enable_shared_from_this<TurnQueue> {
   // Queues a piece. It runs on the serial queue, in a scope of WorkingFor.
   void add(const std::shared_ptr<Account>& account, Piece piece);
 
+  // Runs a piece: to its end at once when the calling thread runs other work of the queue than a turn, as it
+  // does while it plays the journal; else adds it.
+  void run(const std::shared_ptr<Account>& account, Piece piece);
+
   // Runs `work` at once, on the calling thread and as the serial queue's own work, when nothing else runs or
   // waits there and the user has no work that must run before. Returns false, without running it, otherwise.
   template <typename Work>
