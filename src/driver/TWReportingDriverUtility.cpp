@@ -9,6 +9,7 @@
 #include <system_error>
 #include <utility>
 
+#include "platform/JournalPosition.h"
 #include "platform/Log.h"
 #include "protocol/AudioEvent.h"
 #include "session/TWReportingContext.h"
@@ -95,6 +96,8 @@ void appendState(std::string& text, const ChanmeterSample& sample, std::int32_t 
 
 void sendStats(TWReportingSession* session, AudioEventType type, ValueMap stats) {
   if (session == nullptr || stats.empty()) return;
+  JournalPosition ofNoRequest;  // a played session has no such message
+  const JournalPosition::Scope scope(ofNoRequest);
   session->sendMessage(
       std::make_shared<TWReportingSessionMessage>(std::move(stats), kCategoryChanmetering, type));
 }

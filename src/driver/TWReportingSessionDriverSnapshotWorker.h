@@ -16,6 +16,7 @@ namespace tonewerk {
 class TWReportingSessionDriverSnapshotWorker final : public TWReportingSessionWorkerProducerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
+  static constexpr bool kIsForLiveSessions = true;
   const TWReportingSessionWorkerClass& workerClass() const override { return kWorkerClass; }
 
   explicit TWReportingSessionDriverSnapshotWorker(const std::shared_ptr<TWReportingSession>& owner) {

@@ -5,6 +5,7 @@
 #include <utility>
 
 #include "monitor/TWReportingSystemMonitor.h"
+#include "platform/JournalPosition.h"
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionMessage.h"
@@ -61,6 +62,8 @@ void TWReportingSessionSystemMonitorWorker::handleChange(const ValueMap* state) 
   }
   const auto owner = session.lock();
   if (payload.empty() || owner == nullptr) return;
+  JournalPosition ofNoRequest;  // a played session has no such message
+  const JournalPosition::Scope scope(ofNoRequest);
   owner->sendMessage(
       std::make_shared<TWReportingSessionMessage>(std::move(payload), kCategorySetup, kTypeSetup));
 }

@@ -20,6 +20,7 @@ namespace tonewerk {
 class TWReportingSessionSystemMonitorWorker final : public TWReportingSessionWorkerProducerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
+  static constexpr bool kIsForLiveSessions = true;
   const TWReportingSessionWorkerClass& workerClass() const override { return kWorkerClass; }
 
   // Uses the monitor that exists now. Without a monitor the worker does nothing.

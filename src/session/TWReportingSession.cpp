@@ -198,6 +198,7 @@ void TWReportingSession::makeWorker(const TWReportingSessionWorkerClass& workerC
              workerClass, reporterID_);
     return;
   }
+  if (workerClass.isForLiveSessions && TWReportingContext::current().journal().isPlaying()) return;
   const auto isOfClass = [&](const MadeWorker& worker) { return worker.workerClass == &workerClass; };
   if (hasWorkerOf(workerClass) || std::any_of(made.begin(), made.end(), isOfClass)) {
     debugLog(debug, "TWReportingSessionWorker already initialized. action=skipped worker=%@ reporterID=%lli",

@@ -56,6 +56,9 @@ struct TWReportingSessionWorkerClass {
   MessageTypes handledTypes = MessageTypes::all();
   // The types of messages for which a consumer of this class may wait, for a time or a tool.
   MessageTypes slowTypes = MessageTypes::none();
+  // Whether its workers report on the device as it is while the session runs, or to others outside of it.
+  // Sessions that are played from the journal have none of them.
+  bool isForLiveSessions = false;
 
   std::string description() const { return std::string(name); }
 };
@@ -84,6 +87,12 @@ template <typename T>
 constexpr MessageTypes slowTypes() {
   if constexpr (requires { T::kSlowTypes; }) return T::kSlowTypes;
   return MessageTypes::none();
+}
+
+template <typename T>
+constexpr bool isForLiveSessions() {
+  if constexpr (requires { T::kIsForLiveSessions; }) return T::kIsForLiveSessions;
+  return false;
 }
 
 using Session = std::shared_ptr<TWReportingSession>;
@@ -121,7 +130,8 @@ constexpr TWReportingSessionWorkerClass workerClassOf(std::string_view name) {
           worker_class_detail::handlesSingleMessageSession<T>(),
           worker_class_detail::maker<T>(),
           worker_class_detail::handledTypes<T>(),
-          worker_class_detail::slowTypes<T>()};
+          worker_class_detail::slowTypes<T>(),
+          worker_class_detail::isForLiveSessions<T>()};
 }
 
 }  // namespace tonewerk

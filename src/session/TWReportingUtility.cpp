@@ -50,12 +50,13 @@ double TWReportingUtilityVolumeMinimumPlayingTime(AudioServiceType /*type*/) { r
 
 ValueMap TWReportingUtilityAddDates(const ValueMap& map) {
   const Platform& platform = TWReportingContext::current().platform();
+  ValueMap stamped = map;
+  stamped.set(TWReportingInternalEventEpochTime, platform.clock.now());
+  if (TWReportingContext::current().journal().isRecovering()) return stamped;
   // Computed in single precision, because readers of this value have always got it so.
   const auto ticks = static_cast<float>(platform.processes.processorTimeMicroseconds());
   const float processorMs = ticks / 1000000.0F * 1000.0F;
 
-  ValueMap stamped = map;
-  stamped.set(TWReportingInternalEventEpochTime, platform.clock.now());
   stamped.set(TWReportingInternalEventSystemUptimeSec,
               static_cast<std::int32_t>(std::lround(platform.system.uptimeSeconds())));
   stamped.set(TWReportingInternalEventProcessUptimeMS, static_cast<std::int32_t>(std::lround(processorMs)));

@@ -35,7 +35,8 @@ inline ReporterID TWReportingUtilityExtractSessionIDFromReporterID(ReporterID re
 double TWReportingUtilityVolumeMinimumPlayingTime(AudioServiceType type);
 
 // Returns a copy of `map` with the wall-clock time, the system's uptime in whole seconds and the daemon's
-// processor time in whole milliseconds.
+// processor time in whole milliseconds. In a recovery only the first: the others say nothing about the time
+// before the crash. On the work queue.
 ValueMap TWReportingUtilityAddDates(const ValueMap& map);
 
 // Rounds to so many decimal places, halves away from zero. Negative places round to tens, hundreds and so on.

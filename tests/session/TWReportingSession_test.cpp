@@ -568,6 +568,18 @@ TEST_F(WorkerTest, TheDaemonsClassesAreInTheRegistrysOrder) {
                           "TWReportingSessionRtcWorker", "TWReportingSessionIssueDraftWorker"));
 }
 
+TEST_F(WorkerTest, WhatShowsTheDeviceAsItIsOrTellsOthersIsLeftOutOfPlayedSessions) {
+  std::vector<const TWReportingSessionWorkerClass*> left;
+  for (const TWReportingSessionWorkerClass* workerClass : allWorkerClasses()) {
+    if (workerClass->isForLiveSessions) left.push_back(workerClass);
+  }
+  EXPECT_THAT(namesOf(left),
+              ElementsAre("TWReportingSessionTraceWorker", "TWReportingSessionMemoryLogWorker",
+                          "TWReportingSessionDriverSnapshotWorker", "TWReportingSessionSystemMonitorWorker",
+                          "TWReportingSessionCapsaWorker", "TWReportingSessionDPWorker",
+                          "TWReportingSessionRtcWorker", "TWReportingSessionIssueDraftWorker"));
+}
+
 TEST_F(WorkerTest, TheRegistryIsFilledOnce) {
   makeSession();
   const auto* classes = &TWReportingSession::getAllWorkerClasses();

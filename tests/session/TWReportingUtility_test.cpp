@@ -186,6 +186,14 @@ TEST_F(TWReportingUtilityTest, StampsACopyWithTheThreeTimes) {
   EXPECT_EQ(original.text("systemuptime_sec"), "old");
 }
 
+TEST_F(TWReportingUtilityTest, StampsNoUptimesInARecovery) {
+  test.clock.setNow(1'700'000'000.25);
+  context->journal().play({});
+  EXPECT_EQ(TWReportingUtilityAddDates({}), ValueMap({{"twreporting_timestamp", 1'700'000'000.25}}));
+  context->journal().endRecovery();
+  EXPECT_EQ(TWReportingUtilityAddDates({}).size(), 3U);
+}
+
 TEST_F(TWReportingUtilityTest, ProcessorTimeIsConvertedInSinglePrecision) {
   test.processes.setProcessorTime(100'000'001'000);  // a double would give 100000001
   EXPECT_EQ(TWReportingUtilityAddDates({}).integer("processuptime_ms"), 100'000'000);

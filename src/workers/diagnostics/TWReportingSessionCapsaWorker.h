@@ -18,6 +18,7 @@ namespace tonewerk {
 class TWReportingSessionCapsaWorker final : public TWReportingSessionWorkerConsumerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
+  static constexpr bool kIsForLiveSessions = true;
   const TWReportingSessionWorkerClass& workerClass() const override { return kWorkerClass; }
   static constexpr bool handleSingleMessageSession() { return true; }
   bool handleRedundantMessages() const override { return true; }

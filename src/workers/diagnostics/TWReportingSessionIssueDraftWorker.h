@@ -19,6 +19,7 @@ class TWReportingDefaults;
 class TWReportingSessionIssueDraftWorker final : public TWReportingSessionWorkerConsumerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
+  static constexpr bool kIsForLiveSessions = true;
   const TWReportingSessionWorkerClass& workerClass() const override { return kWorkerClass; }
   static constexpr bool handleSingleMessageSession() { return true; }
 

@@ -14,6 +14,7 @@ namespace tonewerk {
 class TWReportingSessionMemoryLogWorker final : public TWReportingSessionWorkerConsumerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
+  static constexpr bool kIsForLiveSessions = true;
   const TWReportingSessionWorkerClass& workerClass() const override { return kWorkerClass; }
   static constexpr MessageTypes kHandledTypes = MessageTypes::only(kTypeMemoryLog);
   static constexpr MessageTypes kSlowTypes = kHandledTypes;

@@ -22,6 +22,7 @@ class TraceRun;
 class TWReportingSessionTraceWorker final : public TWReportingSessionWorkerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
+  static constexpr bool kIsForLiveSessions = true;
   const TWReportingSessionWorkerClass& workerClass() const override { return kWorkerClass; }
 
   explicit TWReportingSessionTraceWorker(const std::shared_ptr<TWReportingSession>& owner);

@@ -21,13 +21,13 @@ constexpr std::string_view kExtension = ".json";
 // The lines of many messages take one write, and such a block is written without a copy.
 constexpr std::size_t kBlockBytes = std::size_t{256} << 10;
 
-std::string numbered(const std::string& name, std::size_t number) {
+}  // namespace
+
+std::string SummaryJsonFile::numbered(const std::string& name, std::size_t number) {
   if (number == 1) return name;
   return name.substr(0, name.size() - kExtension.size()) + "-" + std::to_string(number) +
          std::string(kExtension);
 }
-
-}  // namespace
 
 SummaryJsonFile::SummaryJsonFile(std::string directory, std::string name)
     : directory_(std::move(directory)), name_(std::move(name)) {

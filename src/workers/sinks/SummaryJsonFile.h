@@ -41,6 +41,9 @@ class SummaryJsonFile {
   SummaryJsonFile(std::string directory, std::string name);
   ~SummaryJsonFile();
 
+  // The name that the file gets when `number` - 1 others have its name.
+  static std::string numbered(const std::string& name, std::size_t number);
+
   // Writes a member whose name is the category, the type and how many messages of both the file has had.
   void writeMessage(AudioEventCategory category, AudioEventType type, const ValueMap& payload);
 

@@ -18,6 +18,7 @@ class TWReportingDefaults;
 class TWReportingSessionDPWorker final : public TWReportingSessionWorkerConsumerProtocol {
  public:
   static const TWReportingSessionWorkerClass kWorkerClass;
+  static constexpr bool kIsForLiveSessions = true;
   static constexpr MessageTypes kSlowTypes = MessageTypes::only(kTypeError);
   const TWReportingSessionWorkerClass& workerClass() const override { return kWorkerClass; }
 

@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "platform/Clock.h"
+#include "platform/JournalPosition.h"
 #include "session/ForEachMessage.h"
 #include "session/LocalTime.h"
 #include "session/MessageShapes.h"
@@ -71,10 +72,20 @@ std::string TWReportingSessionSummaryJsonFileWorker::TWReportingLogsDirectory() 
 
 std::string TWReportingSessionSummaryJsonFileWorker::fileNameFor(const TWReportingSession& session) {
   const Clock& clock = TWReportingContext::current().platform().clock;
-  const double now = clock.now();
+  const JournalPosition request = JournalPosition::current();
+  const double now = request.sequence() == 0 ? clock.now() : request.at();
   return localTimeText(now, clock.utcOffset(now)) + "-" + std::to_string(session.reporterID()) + "-" +
          TWReportingUtilityRetrieveAppName(session.configuration()).string() + "-" +
          TWReportingUtilityGenerateServiceNameFromServiceType(session.serviceType()) + ".json";
+}
+
+// During a recovery, the files of sessions that had stopped may be there.
+bool TWReportingSessionSummaryJsonFileWorker::isWrittenAlready(const std::string& name) {
+  TWReportingContext& context = TWReportingContext::current();
+  const std::size_t number = context.journal().countReport(name);
+  if (number == 0) return false;
+  return context.platform().files.exists(TWReportingLogsDirectory() + "/" +
+                                         SummaryJsonFile::numbered(name, number));
 }
 
 void TWReportingSessionSummaryJsonFileWorker::tidyDirectory() {
@@ -85,6 +96,8 @@ void TWReportingSessionSummaryJsonFileWorker::stop() {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   const auto owner = session.lock();
   if (owner == nullptr || owner->messages().empty()) return;
+  std::string name = fileNameFor(*owner);
+  if (isWrittenAlready(name)) return;
   std::vector<Entry> entries;
   entries.reserve(owner->messages().size());
   std::size_t bytes = 0;
@@ -97,9 +110,8 @@ void TWReportingSessionSummaryJsonFileWorker::stop() {
   SinkQueue& queue = TWReportingContext::current().fileSinkQueue();
   // The queue counts and logs a file that is dropped because the disk hangs.
   static_cast<void>(queue.submit(
-      bytes,
-      [&queue, file = std::make_unique<SummaryJsonFile>(TWReportingLogsDirectory(), fileNameFor(*owner)),
-       entries = std::move(entries)]() mutable {
+      bytes, [&queue, file = std::make_unique<SummaryJsonFile>(TWReportingLogsDirectory(), std::move(name)),
+              entries = std::move(entries)]() mutable {
         if (!writeFile(*file, entries)) return queue.countLost();
         if (file->bytes() > 0) summaryDirectory().added(file->bytes());
       }));

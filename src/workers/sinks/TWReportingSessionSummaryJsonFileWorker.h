@@ -34,6 +34,7 @@ class TWReportingSessionSummaryJsonFileWorker final : public TWReportingSessionW
   // "20261120-101800+0100-77-com.orvane.player-longformaudio.json": the local time, then the session's
   // identifier, application and service.
   static std::string fileNameFor(const TWReportingSession& session);
+  static bool isWrittenAlready(const std::string& name);
 };
 
 }  // namespace tonewerk

@@ -107,7 +107,8 @@ ValueMap TWReportingSessionSummaryWorker::summaryOf(const TWReportingSession& ow
   summary.add(kServiceName, owner.serviceName());
   summary.add(TWReportingApplicationName, owner.applicationName());
   if (const auto name = owner.clientProcessName()) summary.add(kClientProcessName, *name);
-  addDeviceState(summary);
+  // A session that is recovered ended before the crash, when the device was in another state.
+  if (!TWReportingContext::current().journal().isRecovering()) addDeviceState(summary);
   return summary;
 }
 

@@ -62,6 +62,23 @@ TEST_F(TWReportingSessionSummaryWorkerTest, TheSummaryHasAllKeysInOrder) {
       R"("load_avg_15_min":2.5})");
 }
 
+// The device as it is now says nothing about the time of a session that a crash of the daemon has ended.
+TEST_F(TWReportingSessionSummaryWorkerTest, ASummaryMadeInARecoveryLeavesOutHowTheDeviceIsNow) {
+  RequestJournal& journal = context->journal();
+  journal.play({});
+  session->start();
+  journal.endPlaying();
+  const ValueMap summary = summaryAtStop();
+  EXPECT_TRUE(summary.contains("num_messages"));
+  for (const char* key : {"thermal_state", "low_power_enabled", "vmInfo_phys_footprint_MiB", "load_avg_1_min",
+                          "load_avg_5_min", "load_avg_15_min"}) {
+    EXPECT_FALSE(summary.contains(key)) << key;
+  }
+  journal.endRecovery();
+  session->start();
+  EXPECT_TRUE(summaryAtStop().contains("thermal_state"));
+}
+
 TEST_F(TWReportingSessionSummaryWorkerTest, WithoutDurationsNothingWasActive) {
   session->start();
   const ValueMap summary = summaryAtStop();
