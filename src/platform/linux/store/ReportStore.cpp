@@ -3,13 +3,18 @@
 
 #include <algorithm>
 #include <cassert>
+#include <cerrno>
+#include <fcntl.h>
 #include <pthread.h>
+#include <unistd.h>
 #include <utility>
 
 #include "platform/Clock.h"
 #include "platform/Log.h"
 #include "platform/PreferenceStore.h"
 #include "platform/accounts/Accounts.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
+#include "platform/linux/files/TextFile.h"
 #include "values/GrowingDelay.h"
 
 namespace tonewerk {
@@ -20,6 +25,9 @@ constexpr double kDaySeconds = 86'400.0;
 // Larger bounds are cut to this (a petabyte, or 2.7 million years), which every type can hold that they are
 // turned into.
 constexpr double kUnbounded = 1e9;
+// Without the marks reports come twice, and nobody may have a descriptor left for a moment.
+constexpr int kMarkTries = 10;
+constexpr std::chrono::milliseconds kMarkPause{20};
 
 bool isNumber(const Value& value) {
   return value.asInteger() != nullptr || value.asUnsigned() != nullptr || value.asDouble() != nullptr;
@@ -29,11 +37,12 @@ bool isNumber(const Value& value) {
 
 ReportStore::ReportStore(const std::string& directory, const JsonService& json,
                          const PreferenceStore& preferences, const Clock& clock, Accounts& accounts,
-                         const LogCategory& log, const Limits& limits)
+                         const LogCategory& log, const Limits& limits, std::function<void()> beforeWriting)
     : preferences_(preferences),
       clock_(clock),
       accounts_(accounts),
       log_(log),
+      beforeWriting_(std::move(beforeWriting)),
       queue_(limits),
       database_(directory, json, clock),
       thread_([this] { run(); }) {
@@ -55,19 +64,67 @@ void ReportStore::record(const MetricRow& row) { add(row); }
 
 void ReportStore::record(const PowerRow& row) { add(row); }
 
-void ReportStore::record(const RtcSessionRow& row) { add(row); }
+// Played sessions have no real-time communication, so its rows must not count.
+void ReportStore::record(const RtcSessionRow& row) { add(row, {}); }
 
-void ReportStore::record(const RtcMessageRow& row) { add(row); }
+void ReportStore::record(const RtcMessageRow& row) { add(row, {}); }
 
 template <typename Row>
-void ReportStore::add(const Row& row) {
-  const bool hangs = queue_.add(row);
+void ReportStore::add(const Row& row, JournalPosition::Row position) {
+  if (isRecovering_ && isHeld(position)) return;
+  addToQueue(row, position);
+}
+
+template <typename Row>
+void ReportStore::addToQueue(const Row& row, JournalPosition::Row position) {
+  const bool hangs = queue_.add(row, position);
   if (hangs) errorLog(log_, "writing to %s hangs; what does not fit is dropped", database_.path());
+}
+
+std::optional<StoreMarks> ReportStore::marks() {
+  triedToOpen_.wait();
+  std::string problem;
+  std::optional<StoreMarks> marks = readStoreMarks(database_.path(), problem);
+  for (int tries = 1; !marks && tries < kMarkTries; ++tries) {
+    std::this_thread::sleep_for(kMarkPause);
+    marks = readStoreMarks(database_.path(), problem);
+  }
+  if (!marks) errorLog(log_, "cannot read what %s holds of the journal: %s", database_.path(), problem);
+  return marks;
+}
+
+void ReportStore::beginPlaying(StoreMarks marks) {
+  heldMarks_ = std::move(marks);
+  isPlaying_ = true;
+  isRecovering_ = true;
+}
+
+void ReportStore::endRecovery() {
+  isPlaying_ = false;
+  isRecovering_ = false;
+}
+
+bool ReportStore::isHeld(JournalPosition::Row position) const {
+  if (position.sequence == 0) return isPlaying_;
+  const Account* account = WorkingFor::accountIfAny();
+  const auto held = heldMarks_.find(account == nullptr ? kNoUser : account->user());
+  return held != heldMarks_.end() && position <= held->second;
 }
 
 void ReportStore::readBoundsAgain() {
   areBoundsStale_ = true;
   queue_.wakeWriter();
+}
+
+bool ReportStore::sync() const {
+  for (const std::string& path : {database_.path() + "-wal", database_.path()}) {
+    const FileDescriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC));
+    const bool isSynced = file ? ::fdatasync(file.get()) == 0 : errno == ENOENT;
+    if (isSynced) continue;
+    errorLog(log_, "cannot bring %s to the disk: %@", path, lastSystemError().message());
+    return false;
+  }
+  return true;
 }
 
 bool ReportStore::flush(std::chrono::milliseconds timeout) {
@@ -86,6 +143,7 @@ void ReportStore::run() {
   } else {
     queue_.failed();
   }
+  triedToOpen_.count_down();
   while (takeBatch()) {
     if (!writeUntilDone()) return;
   }
@@ -131,6 +189,7 @@ bool ReportStore::write() {
 }
 
 StoreDatabase::Result ReportStore::writeOrBeginAnew() {
+  if (beforeWriting_) beforeWriting_();
   const StoreDatabase::Result result = database_.write(batch_);
   if (result != StoreDatabase::Result::kCorrupt) return result;
   return moveAside() ? database_.write(batch_) : StoreDatabase::Result::kFailed;

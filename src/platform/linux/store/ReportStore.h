@@ -4,8 +4,11 @@
 #include <atomic>
 #include <chrono>
 #include <cstdint>
+#include <functional>
+#include <latch>
 #include <map>
 #include <memory>
+#include <optional>
 #include <string>
 #include <string_view>
 #include <thread>
@@ -50,9 +53,11 @@ class ReportStore {
 
   // The file is in `directory`, which is made when it is missing. All references outlive the store. In
   // `accounts` the total of Resource::kSinkBytes becomes that of `limits`, and the total of kStoredBytes the
-  // bound of size.
+  // bound of size. The store's thread calls `beforeWriting` before each transaction, unless it is empty: what
+  // rows came from must outlive a crash not less than the rows.
   ReportStore(const std::string& directory, const JsonService& json, const PreferenceStore& preferences,
-              const Clock& clock, Accounts& accounts, const LogCategory& log, const Limits& limits = {});
+              const Clock& clock, Accounts& accounts, const LogCategory& log, const Limits& limits = {},
+              std::function<void()> beforeWriting = {});
   ReportStore(const ReportStore&) = delete;
   ReportStore& operator=(const ReportStore&) = delete;
   // Writes the rows that are left, and gives up when that fails. Logs how many rows are lost.
@@ -65,6 +70,23 @@ class ReportStore {
   void record(const PowerRow& row);
   void record(const RtcSessionRow& row);
   void record(const RtcMessageRow& row);
+
+  // Before anything is recorded: the marks in the file. Waits for the store's thread to open the file.
+  // What fails is tried again for a fifth of a second. None on failure, which is logged.
+  [[nodiscard]] std::optional<StoreMarks> marks();
+  // While the journal is played, rows are left out that are not after `marks`, and until endPlaying() rows of
+  // no request, too. Like these, on the thread that plays, while no other thread records.
+  void beginPlaying(StoreMarks marks);
+  void endPlaying() { isPlaying_ = false; }
+  // Nothing is left out any more.
+  void endRecovery();
+
+  // Any thread. How many rows have been recorded, and whether the first `rows` of them are in the file.
+  std::uint64_t recordedRows() const { return queue_.added(); }
+  bool hasWritten(std::uint64_t rows) const { return queue_.hasCommitted(rows); }
+  // Any thread. Brings to the disk what is in the file; until then a power cut may take it away. May take
+  // long. False on failure, which is logged.
+  [[nodiscard]] bool sync() const;
 
   // Any thread. The bounds are read again and applied at once, also when there is nothing to write.
   void readBoundsAgain();
@@ -89,7 +111,11 @@ class ReportStore {
   static constexpr std::chrono::milliseconds kLongestBackOff{30'000};
 
   template <typename Row>
-  void add(const Row& row);
+  void add(const Row& row, JournalPosition::Row position = JournalPosition::nextRow());
+  template <typename Row>
+  void addToQueue(const Row& row, JournalPosition::Row position);
+  // Whether a row is in the file, or was of no request when the journal's requests ran first.
+  bool isHeld(JournalPosition::Row position) const;
   void run();
   [[nodiscard]] bool takeBatch();
   [[nodiscard]] bool pause(std::chrono::nanoseconds time);
@@ -108,8 +134,13 @@ class ReportStore {
   const Clock& clock_;
   Accounts& accounts_;
   const LogCategory& log_;
+  const std::function<void()> beforeWriting_;
   StoreQueue queue_;
   std::atomic<bool> areBoundsStale_ = true;
+  std::atomic<bool> isRecovering_ = false;
+  std::atomic<bool> isPlaying_ = false;
+  StoreMarks heldMarks_;       // written before isRecovering_ is set
+  std::latch triedToOpen_{1};  // the thread has tried to open the file
   const std::shared_ptr<Heartbeat> heartbeat_ = std::make_shared<Heartbeat>();
 
   // Used by the thread alone.

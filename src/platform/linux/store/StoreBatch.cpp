@@ -124,6 +124,7 @@ void StoreBatch::clear() {
   rows_ = 0;
   bytes_ = 0;
   charges_.clear();
+  marks_.clear();
 }
 
 StoreBatch::Part StoreBatch::append(std::string_view text) {
@@ -136,6 +137,7 @@ void StoreBatch::count(std::size_t bytes, const StoreRowOwner& owner) {
   ++rows_;
   bytes_ += bytes;
   if (owner.account != nullptr) charges_.add(*owner.account, owner.charge);
+  if (owner.position.sequence != 0) marks_[owner.user] = owner.position;
 }
 
 std::uint32_t StoreBatch::indexOf(const EventNames& names) {

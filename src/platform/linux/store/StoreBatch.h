@@ -11,8 +11,10 @@
 #include <string_view>
 #include <vector>
 
+#include "platform/JournalPosition.h"
 #include "platform/linux/store/JsonCut.h"
 #include "platform/linux/store/StoreCharges.h"
+#include "platform/linux/store/StoreMarks.h"
 #include "platform/linux/store/StoreRow.h"
 #include "protocol/RequestSet.h"
 
@@ -24,6 +26,8 @@ struct StoreRowOwner {
   // Who bears how many bytes for the row; null when nobody does.
   Account* account = nullptr;
   std::size_t charge = 0;
+  // The row's place in the journal.
+  JournalPosition::Row position = {};
 };
 
 // The text that a batch keeps of one row: its payload as JSON, after a name that is the row's own. It is made
@@ -142,6 +146,8 @@ class StoreBatch {
   std::size_t bytes() const { return bytes_; }
   // What the owners of the rows bear for them.
   const StoreCharges& charges() const { return charges_; }
+  // The last rows of each user's requests.
+  const StoreMarks& marks() const { return marks_; }
   // The size of the buffer of the text.
   std::size_t textCapacity() const { return text_.capacity(); }
 
@@ -183,6 +189,7 @@ class StoreBatch {
   std::size_t rows_ = 0;
   std::size_t bytes_ = 0;
   StoreCharges charges_;
+  StoreMarks marks_;
 };
 
 }  // namespace tonewerk

@@ -41,7 +41,8 @@ bool StoreDatabase::insert(const StoreBatch& batch) {
     holdings_.addRow(session.user, session.bytes);
   }
   return numbering_->number(batch) && analytics_->insert(batch, *numbering_) && metrics_->insert(batch) &&
-         power_->insert(batch) && rtc_->insertMessages(batch, numbering_->rtcMessages());
+         power_->insert(batch) && rtc_->insertMessages(batch, numbering_->rtcMessages()) &&
+         marks_->write(batch.marks());
 }
 
 void StoreDatabase::setBounds(const StoreBounds& bounds) {
@@ -105,6 +106,7 @@ StoreDatabase::Result StoreDatabase::open() {
   metrics_.emplace(database_);
   power_.emplace(database_);
   rtc_.emplace(database_, json_, fileNumber_);
+  marks_.emplace(database_);
   trimmer_.emplace(database_, holdings_, clock_);
   recognizeFile();
   return Result::kDone;
@@ -178,6 +180,7 @@ void StoreDatabase::close() {
   power_.reset();
   rtc_.reset();
   trimmer_.reset();
+  marks_.reset();
   database_.close();
   holdings_.undo();
 }

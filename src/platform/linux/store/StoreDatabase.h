@@ -13,6 +13,7 @@
 #include "platform/linux/store/SqliteDatabase.h"
 #include "platform/linux/store/StoreBatch.h"
 #include "platform/linux/store/StoreHoldings.h"
+#include "platform/linux/store/StoreMarks.h"
 #include "platform/linux/store/StoreNumbering.h"
 #include "platform/linux/store/StoreTrimmer.h"
 
@@ -85,6 +86,7 @@ class StoreDatabase {
   std::optional<MetricTable> metrics_;
   std::optional<PowerTable> power_;
   std::optional<RtcTable> rtc_;
+  std::optional<StoreMarkTable> marks_;
   std::optional<StoreTrimmer> trimmer_;
   // Numbers the files that this process began or found; this is the open one's number.
   std::uint64_t fileNumber_ = 1;

@@ -168,6 +168,16 @@ bool StoreQueue::pause(std::chrono::nanoseconds time) {
   return !stopped_;
 }
 
+std::uint64_t StoreQueue::added() const {
+  const MutexLock lock(mutex_);
+  return added_;
+}
+
+bool StoreQueue::hasCommitted(std::uint64_t added) const {
+  const MutexLock lock(mutex_);
+  return committed_ >= added;
+}
+
 std::uint64_t StoreQueue::takeDropped() {
   const MutexLock lock(mutex_);
   return std::exchange(dropped_, 0);

@@ -56,8 +56,9 @@ class StoreQueue {
   // type that StoreBatch takes, and belongs to the user for whom the thread works (WorkingFor). True when
   // this row waited for the whole hold time, so that from now on rows are dropped.
   template <typename Row>
-  [[nodiscard]] bool add(const Row& row) {
+  [[nodiscard]] bool add(const Row& row, JournalPosition::Row position = {}) {
     StoreRowOwner owner;
+    owner.position = position;
     owner.account = WorkingFor::accountIfAny();
     if (owner.account != nullptr) owner.user = owner.account->user();
     if (isShared(row, owner)) return false;
@@ -104,6 +105,9 @@ class StoreQueue {
   // is the last.
   [[nodiscard]] bool pause(std::chrono::nanoseconds time);
 
+  // Any thread. How many rows have been added, and whether the first `added` of them are committed.
+  std::uint64_t added() const;
+  bool hasCommitted(std::uint64_t added) const;
   // Any thread. The number of rows dropped since the last call.
   [[nodiscard]] std::uint64_t takeDropped();
   // Any thread. All rows that wait or are being written, all that were dropped, and for how long the writer

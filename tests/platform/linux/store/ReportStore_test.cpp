@@ -6,7 +6,9 @@
 #include <cmath>
 #include <filesystem>
 #include <fstream>
+#include <functional>
 #include <gmock/gmock.h>
+#include <iterator>
 #include <memory>
 #include <optional>
 #include <random>
@@ -25,6 +27,7 @@
 #include "platform/linux/store/StoreDatabase.h"
 #include "platform/linux/store/StoreSchema.h"
 #include "platform/linux/store/StoreTrimmer.h"
+#include "support/InterceptedCalls.h"
 #include "support/TemporaryDirectory.h"
 #include "support/manual/ManualClock.h"
 #include "support/memory/MemoryJsonService.h"
@@ -57,8 +60,8 @@ class ReportStoreTest : public testing::Test {
  protected:
   void open(const ReportStore::Limits& limits = {}) {
     store_.reset();
-    store_ =
-        std::make_unique<ReportStore>(directory_, json_, preferences_, clock_, accounts_, category_, limits);
+    store_ = std::make_unique<ReportStore>(directory_, json_, preferences_, clock_, accounts_, category_,
+                                           limits, beforeWriting_);
   }
   void close() { store_.reset(); }
 
@@ -74,7 +77,11 @@ class ReportStoreTest : public testing::Test {
   }
   bool flush() { return store_->flush(kLongEnough); }
 
-  std::string file() const { return directory_ + "/reports.db"; }
+  std::string file() const { return file_; }
+  static std::string contentsOf(const std::string& path) {
+    std::ifstream file(path, std::ios::binary);
+    return {std::istreambuf_iterator<char>(file), {}};
+  }
 
   std::vector<Event> events(const std::string& where = "1") {
     SqliteDatabase database;
@@ -103,12 +110,14 @@ class ReportStoreTest : public testing::Test {
 
   TemporaryDirectory temporary_;
   std::string directory_ = temporary_.path("state");
+  std::string file_ = directory_ + "/reports.db";
   ManualClock clock_;
   MemoryLog log_;
   LogCategory category_{log_, "com.orvane.tonewerk", "twrs"};
   MemoryJsonService json_;
   MemoryPreferenceStore preferences_;
   Accounts accounts_{kOwner, clock_};
+  std::function<void()> beforeWriting_;
   std::unique_ptr<ReportStore> store_;
 };
 
@@ -123,6 +132,129 @@ TEST_F(ReportStoreTest, KeepsAnEventWithItsTimeNameAndPayload) {
   EXPECT_EQ(found[0].name, "com.orvane.telephony.Playback.Stop");
   EXPECT_EQ(found[0].payload, R"({"volume":0.5,"device":"Speaker","at":"1970-01-01T00:00:00.5Z"})");
   EXPECT_THAT(errors(), IsEmpty());
+}
+
+// --- Rows of the journal's requests ---
+
+TEST_F(ReportStoreTest, KnowsTheLastRowOfEachUsersRequests) {
+  open();
+  EXPECT_THAT(store_->marks(), testing::Optional(IsEmpty()));
+  const auto recordFor = [&](std::uint32_t user, std::uint64_t sequence, int rows) {
+    const std::shared_ptr<Account> account = accounts_.of(user);
+    const WorkingFor scope(account);
+    JournalPosition position(sequence);
+    const JournalPosition::Scope request(position);
+    recordNumbered(rows);
+  };
+  recordFor(1001, 7, 2);
+  recordFor(1002, 8, 1);
+  ASSERT_TRUE(flush());
+  recordFor(1001, 9, 3);
+  recordNumbered(1);  // of no request
+  ASSERT_TRUE(flush());
+  EXPECT_THAT(store_->marks(), testing::Optional(StoreMarks{{1001, {9, 3}}, {1002, {8, 1}}}));
+}
+
+TEST_F(ReportStoreTest, LeavesOutWhatItHasWhileTheJournalIsPlayed) {
+  open();
+  store_->beginPlaying({{1001, {7, 2}}});
+  const std::shared_ptr<Account> account = accounts_.of(1001);
+  const auto play = [&](std::uint64_t sequence, int rows, int first) {
+    const WorkingFor scope(account);
+    JournalPosition position(sequence);
+    const JournalPosition::Scope request(position);
+    recordNumbered(rows, first);
+  };
+  play(6, 1, 0);
+  play(7, 3, 10);  // two of them are there
+  play(8, 1, 20);
+  recordNumbered(1, 30);  // of no request
+  store_->endPlaying();
+  recordNumbered(1, 40);
+  play(7, 1, 50);
+  store_->endRecovery();
+  play(7, 1, 60);
+  ASSERT_TRUE(flush());
+  EXPECT_THAT(payloads(), ElementsAre(R"({"n":12})", R"({"n":20})", R"({"n":40})", R"({"n":60})"));
+}
+
+// Played sessions have none, so the other rows must have the same numbers with them and without.
+TEST_F(ReportStoreTest, RowsOfRealTimeCommunicationDoNotCountAmongThoseOfARequest) {
+  open();
+  const std::shared_ptr<Account> account = accounts_.of(1001);
+  const auto session = std::make_shared<RtcSessionRecord>();
+  {
+    const WorkingFor scope(account);
+    JournalPosition position(7);
+    const JournalPosition::Scope request(position);
+    store_->record(RtcSessionRow{session});
+    store_->record(RtcMessageRow{clock_.now(), session, 4, 1, {{"m", 1}}});
+    recordNumbered(2);
+    store_->record(RtcMessageRow{clock_.now(), session, 4, 1, {{"m", 2}}});
+  }
+  ASSERT_TRUE(flush());
+  EXPECT_THAT(store_->marks(), testing::Optional(StoreMarks{{1001, {7, 2}}}));
+}
+
+// Without them a recovery would record everything twice.
+TEST_F(ReportStoreTest, MarksOfAFileThatCannotBeOpenedForAMomentAreReadAllTheSame) {
+  open();
+  {
+    const std::shared_ptr<Account> account = accounts_.of(1001);
+    const WorkingFor scope(account);
+    JournalPosition position(7);
+    const JournalPosition::Scope request(position);
+    recordNumbered(1);
+  }
+  ASSERT_TRUE(flush());
+  int failures = 6;
+  std::optional<StoreMarks> marks;
+  const bool isTried = runIntercepted(
+      SYS_openat, [&failures](const seccomp_data&) { return failures-- > 0 ? EMFILE : 0; },
+      [&] { marks = store_->marks(); });
+  if (!isTried) GTEST_SKIP() << "system calls cannot be intercepted here";
+  EXPECT_LT(failures, 0);
+  EXPECT_THAT(marks, testing::Optional(StoreMarks{{1001, {7, 1}}}));
+}
+
+TEST_F(ReportStoreTest, CallsWhatMustHappenBeforeEachTransaction) {
+  std::atomic<int> calls = 0;
+  std::int64_t rows = -1;
+  beforeWriting_ = [&] {
+    ++calls;
+    if (std::filesystem::exists(file_)) rows = number("SELECT count(*) FROM analytics_row");
+  };
+  open();
+  recordNumbered(1);
+  ASSERT_TRUE(flush());
+  const int before = calls;
+  recordNumbered(1);
+  ASSERT_TRUE(flush());
+  EXPECT_EQ(calls, before + 1);
+  EXPECT_EQ(rows, 1);
+}
+
+TEST_F(ReportStoreTest, BringsWhatIsWrittenToTheDiskAndSaysWhenThatFails) {
+  open();
+  recordNumbered(1);
+  ASSERT_TRUE(flush());
+  EXPECT_TRUE(store_->sync());
+  bool isSynced = true;
+  const bool isTried = runIntercepted(
+      SYS_fdatasync, [](const seccomp_data&) { return EIO; }, [&] { isSynced = store_->sync(); });
+  if (!isTried) GTEST_SKIP() << "system calls cannot be intercepted here";
+  EXPECT_FALSE(isSynced);
+  EXPECT_THAT(errors(), ElementsAre(HasSubstr("cannot bring " + file_ + "-wal to the disk: ")));
+}
+
+TEST_F(ReportStoreTest, SaysWhenRowsAreWritten) {
+  open();
+  EXPECT_TRUE(store_->hasWritten(store_->recordedRows()));
+  recordNumbered(3);
+  EXPECT_EQ(store_->recordedRows(), 3U);
+  ASSERT_TRUE(flush());
+  EXPECT_TRUE(store_->hasWritten(3));
+  EXPECT_FALSE(store_->hasWritten(4));
 }
 
 TEST_F(ReportStoreTest, KeepsEventsInTheOrderOfRecording) {
