@@ -28,6 +28,7 @@
 #include "session/TWReportingSession.h"
 #include "session/TWReportingSessionMessage.h"
 #include "support/TemporaryDirectory.h"
+#include "support/memory/MemoryJournal.h"
 #include "support/memory/reports/MemoryDiagwire.h"
 #include "support/memory/reports/MemoryEnergybook.h"
 #include "support/memory/reports/MemoryLinkReport.h"
@@ -175,8 +176,10 @@ class Benchmark {
   MemoryDiagwire diagwire_;
   MemoryLinkReport linkReport_;
   const Tracing tracing_ = makeUnavailableTracing("not measured");
-  TWReportingContext context_{linux_.platform(metricon_, energybook_, diagwire_, linkReport_, tracing_),
-                              allWorkerClasses()};
+  MemoryJournal journal_;
+  TWReportingContext context_{
+      linux_.platform(linux_.clock(), metricon_, energybook_, diagwire_, linkReport_, tracing_, journal_),
+      allWorkerClasses()};
   const TWReportingDriverUtility* utility_ = nullptr;
   std::optional<AllChannels> all_;
   Costs costs_;

@@ -7,10 +7,12 @@
 #include <chrono>
 #include <csignal>
 #include <cstddef>
+#include <cstdint>
 #include <filesystem>
 #include <initializer_list>
 #include <iostream>
 #include <memory>
+#include <optional>
 #include <pthread.h>
 #include <string>
 #include <string_view>
@@ -19,6 +21,7 @@
 
 #include "monitor/TWReportingSystemMonitor.h"
 #include "platform/Heartbeat.h"
+#include "platform/JournalPreferences.h"
 #include "platform/Log.h"
 #include "platform/MemoryReserve.h"
 #include "platform/Platform.h"
@@ -31,6 +34,11 @@
 #include "platform/linux/diagnostics/LinuxCapsa.h"
 #include "platform/linux/directories/Directories.h"
 #include "platform/linux/directories/SocketPaths.h"
+#include "platform/linux/journal/BatchedJournal.h"
+#include "platform/linux/journal/JournalPlayer.h"
+#include "platform/linux/journal/PlayedClock.h"
+#include "platform/linux/journal/RecoveryAttempts.h"
+#include "platform/linux/journal/SegmentJournal.h"
 #include "platform/linux/messaging/AllocatorReclaimer.h"
 #include "platform/linux/notifications/DirectoryWatcher.h"
 #include "platform/linux/otlp/CurlHttpClient.h"
@@ -47,6 +55,7 @@
 #include "platform/linux/tracing/Tracing.h"
 #include "platform/linux/tracing/TracingSetup.h"
 #include "protocol/Requests.h"
+#include "service/JournalUpkeep.h"
 #include "service/TWReportingClientServerInstance.h"
 #include "service/TWReportingService.h"
 #include "session/TWReportingContext.h"
@@ -71,6 +80,8 @@ constexpr std::chrono::seconds kNetworkTimeout{5};
 constexpr std::chrono::seconds kLogTimeout{2};
 // After this time the end waits for nothing any more: a thread of the daemon hangs.
 constexpr std::chrono::seconds kLongestEnd{60};
+// How long the next part of a recovery may take, until the next word of progress.
+constexpr std::chrono::seconds kRecoveryStep{60};
 // How long it still collects evidence.
 constexpr std::chrono::seconds kDiagnosticsTimeout{3};
 
@@ -95,10 +106,47 @@ std::unique_ptr<WatchdogFeeder> watchdogOf(const ServiceManager& manager, const 
   return std::make_unique<WatchdogFeeder>(*interval, clock, ping, &heartbeats);
 }
 
+// The journal logs wrong values.
+JournalUpkeep::Bounds journalBounds(const PreferenceStore& preferences) {
+  std::string problems;
+  const JournalPreferences read = readJournalPreferences(preferences, problems);
+  const auto interval = std::chrono::ceil<std::chrono::seconds>(read.syncInterval);
+  return {.interval = std::max(interval, std::chrono::seconds(1)), .bytes = read.bytes};
+}
+
 DbusNames dbusNames() {
   return {"com.orvane.tonewerk.reporting", "/com/orvane/tonewerk/reporting",
           "com.orvane.tonewerk.TWReportingServiceProtocol"};
 }
+
+// Tells the service manager and the log from time to time how far a recovery is.
+class RecoveryProgress {
+ public:
+  RecoveryProgress(const ServiceManager& manager, const LogCategory& log) : manager_(manager), log_(log) {}
+
+  void played(std::uint64_t records) {
+    const Time now = Time::clock::now();
+    if (now < toldAt_ + kTellEvery) return;
+    toldAt_ = now;
+    const std::string text = "Recovering sessions: " + std::to_string(records) + " requests";
+    manager_.tellProgress(text, kRecoveryStep);
+    if (now < loggedAt_ + kLogEvery) return;
+    loggedAt_ = now;
+    defaultLog(log_, "recovering sessions: %llu requests so far", records);
+  }
+  double seconds() const { return std::chrono::duration<double>(Time::clock::now() - began_).count(); }
+
+ private:
+  using Time = std::chrono::steady_clock::time_point;
+  static constexpr std::chrono::seconds kTellEvery{1};
+  static constexpr std::chrono::seconds kLogEvery{10};
+
+  const ServiceManager& manager_;
+  const LogCategory& log_;
+  const Time began_ = Time::clock::now();
+  Time toldAt_ = began_ - kTellEvery;  // at once, because one request may take long
+  Time loggedAt_ = began_;
+};
 
 // Holds the daemon's parts, in the order in which they depend on each other.
 class Daemon {
@@ -110,11 +158,15 @@ class Daemon {
         linux_(linux),
         runtimeDirectory_(directories.runtime),
         log_(log),
+        clock_(linux.clock()),
         heartbeats_(log),
-        store_(directories.state, linux.json(), linux.preferences(), linux.clock(), linux.accounts(), log),
-        metricon_(store_, linux.preferences(), linux.clock(), log),
-        energybook_(store_, linux.clock()),
-        diagwire_(store_, linux.clock()),
+        attempts_(directories.state + "/journal", log),
+        segments_(directories.state + "/journal", linux.preferences(), log),
+        store_(directories.state, linux.json(), linux.preferences(), linux.clock(), linux.accounts(), log, {},
+               [this] { writeJournal(); }),
+        metricon_(store_, linux.preferences(), clock_, log),
+        energybook_(store_, clock_),
+        diagwire_(store_, clock_),
         linkReport_(store_, linux.preferences(), linux.clock(), log, TONEWERK_VERSION,
                     [] { return std::make_unique<CurlHttpClient>("twreportingd/" TONEWERK_VERSION); }),
         tracing_(makeTracing({tracesDirectory(directories.state), signpostLibraryName(), traceReaderPath(),
@@ -124,13 +176,21 @@ class Daemon {
         context_(platformOf(linux, directories), allWorkerClasses()),
         service_(TWReportingService::make([this] { endOnKillRequest(); })),
         listener_(std::move(socket), log, linux.accounts(), watchdogOf(manager, linux.clock(), heartbeats_),
-                  &linux.memory()),
+                  &linux.memory(), [this] { writeJournal(); }),
         dbusListener_(dbusNames(), requests::all(), dbusAddressFromEnvironment(), log, linux.accounts(),
                       &linux.memory()) {
     diagnostics_.removeLeftovers();  // this daemon has the socket, so no other one writes there
     TWReportingSessionSummaryJsonFileWorker::tidyDirectory();
     // Read once here, so that reading the device facts again later does not change it.
     hasSignposts_ = context_.isInternalBuild() && isTracingBuiltIn();
+    recover();
+    if (journalBounds(linux_.preferences()).bytes == 0) context_.journal().turnOff();
+    upkeep_ = std::make_unique<JournalUpkeep>(
+        journal_, context_,
+        JournalUpkeep::Reports{.recorded = [this] { return store_.recordedRows(); },
+                               .areWritten = [this](std::uint64_t rows) { return store_.hasWritten(rows); },
+                               .sync = [this] { return store_.sync(); }},
+        [this] { return journalBounds(linux_.preferences()); });
     watchHeartbeats();
     addSinks();
     listener_.setDelegate(*service_);
@@ -177,7 +237,9 @@ class Daemon {
       TWReportingSystemMonitor::reset();  // while the queue of its handlers exists
     });
     queue.drain();
-    (void)flushSinks();
+    if (!flushSinks()) return;
+    queue.async([this] { upkeep_->dropNow(); });
+    queue.drain();
   }
 
   // Whether the destructor would wait for a disk that does not answer.
@@ -192,6 +254,56 @@ class Daemon {
   }
 
  private:
+  // Plays what the last daemon's clients asked for when it did not end in order, so that their sessions are
+  // reported as if it had.
+  void recover() {
+    std::optional<StoreMarks> marks = store_.marks();
+    if (!marks) marks.emplace();  // rather twice than never
+    for (const auto& [user, row] : *marks) journal_.continueAfter(row.sequence);
+    if (journal_.bytes() == 0) return;
+    attempts_.begin();
+    store_.beginPlaying(std::move(*marks));
+    context_.reportingServerQueue().async([this] { playJournal(); });
+    context_.reportingServerQueue().drain();
+    store_.endRecovery();
+    attempts_.finish();
+    // Otherwise the next start plays the same again, and leaves out what is written.
+    const bool isLost = store_.status().dropped > 0 || context_.fileSinkQueue().status().dropped > 0;
+    if (areReportsWritten() && !isLost) journal_.clear();
+  }
+
+  // On the work queue.
+  void playJournal() {
+    RecoveryProgress progress(manager_, log_);
+    JournalPlayer player(
+        journal_, *service_, linux_.accounts(),
+        {.begins = [this](const Journal::Record& record) { context_.journal().play(record); },
+         .endSingleMessages = [this](std::uint32_t user) { service_->stopSingleMessageSession(user); },
+         .progress = [&progress](std::uint64_t records) { progress.played(records); }});
+    const Journal::Reading reading = player.play();
+    const std::size_t clients = player.openClients();
+    const bool hasSingleMessages = !service_->currentSingleMessageSessions().empty();
+    context_.journal().endPlaying();
+    store_.endPlaying();
+    player.endAll();
+    service_->stopSingleMessageSessions();
+    context_.journal().endRecovery();
+    if (clients > 0 || hasSingleMessages) {
+      defaultLog(log_,
+                 "the last daemon did not end in order: sessions of %zu clients recovered from %llu "
+                 "requests in %f s",
+                 clients, reading.records, progress.seconds());
+    }
+    if (reading.damagedPlaces > 0) {
+      errorLog(log_, "the journal is damaged at %llu places: %llu bytes are left out", reading.damagedPlaces,
+               reading.damagedBytes);
+    }
+  }
+
+  // What was answered or stored must be in the journal. It logs a failure, and tries again with the next
+  // record.
+  void writeJournal() { (void)journal_.write(); }
+
   // The messaging thread needs none: it feeds the watchdog itself.
   void watchHeartbeats() {
     heartbeats_.watch("the store", store_.heartbeat());
@@ -224,7 +336,8 @@ class Daemon {
   }
 
   Platform platformOf(LinuxPlatform& linux, const Directories& directories) {
-    Platform platform = linux.platform(metricon_, energybook_, diagwire_, linkReport_, tracing_);
+    Platform platform =
+        linux.platform(clock_, metricon_, energybook_, diagwire_, linkReport_, tracing_, journal_);
     platform.logsDirectory = directories.logs;
     return platform;
   }
@@ -270,7 +383,11 @@ class Daemon {
   const LogCategory& log_;
   std::unique_ptr<Timer> endGuard_;  // made for the end; ends after what may hang
   bool hasSignposts_ = false;
+  PlayedClock clock_;
   Heartbeats heartbeats_;
+  RecoveryAttempts attempts_;
+  SegmentJournal segments_;
+  BatchedJournal journal_{segments_};  // outlives the store's thread, and the listeners
   ReportStore store_;
   StoreMetricon metricon_;
   StoreEnergybook energybook_;
@@ -283,6 +400,7 @@ class Daemon {
   std::shared_ptr<TWReportingService> service_;
   UnixSocketListener listener_;
   DbusListener dbusListener_;
+  std::unique_ptr<JournalUpkeep> upkeep_;
   Mutex killMutex_;                                   // both listeners may get the kill request at once
   std::unique_ptr<DirectoryWatcher> runtimeWatcher_;  // last, because it calls this object
 };

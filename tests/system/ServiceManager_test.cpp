@@ -79,6 +79,7 @@ TEST_F(ServiceManagerSystemTest, IsPingedWhileTheWorkQueueIsBlocked) {
 TEST_F(ServiceManagerSystemTest, IsToldNothingWhileTheWorkQueueHangsAndTheLogNamesIt) {
   daemon.setEnvironment("WATCHDOG_USEC", "400000");
   ASSERT_TRUE(daemon.start());
+  EXPECT_THAT(manager.waitForLine("READY=1"), HasSubstr("READY=1"));
   EXPECT_EQ(manager.waitForLine("WATCHDOG=1"), "WATCHDOG=1");
   {
     const StoppedThread workQueue(daemon.process().identifier(), "eporting.server",
@@ -98,6 +99,7 @@ TEST_F(ServiceManagerSystemTest, IsToldNothingWhileTheWorkQueueHangsAndTheLogNam
 TEST_F(ServiceManagerSystemTest, IsToldNothingWhileTheMessagingThreadHangs) {
   daemon.setEnvironment("WATCHDOG_USEC", "200000");
   ASSERT_TRUE(daemon.start());
+  EXPECT_THAT(manager.waitForLine("READY=1"), HasSubstr("READY=1"));
   EXPECT_EQ(manager.waitForLine("WATCHDOG=1"), "WATCHDOG=1");
   {
     const StoppedThread messaging(daemon.process().identifier(), "tw-messaging",

@@ -148,13 +148,13 @@ void LinuxPlatform::readConfigurationAgain() {
 
 void LinuxPlatform::restoreRuntimeDirectory() { adapters_->notifications.makeDirectory(); }
 
-Platform LinuxPlatform::platform(Metricon& metricon, Energybook& energybook, Diagwire& diagwire,
-                                 LinkReport& linkReport, const Tracing& tracing) {
+Platform LinuxPlatform::platform(Clock& clock, Metricon& metricon, Energybook& energybook, Diagwire& diagwire,
+                                 LinkReport& linkReport, const Tracing& tracing, Journal& journal) {
   Adapters& a = *adapters_;
   return {.log = *a.log,
           .accounts = a.accounts,
           .tracePoints = a.tracePoints,
-          .clock = a.clock,
+          .clock = clock,
           .queues = a.queues,
           .timers = a.timers,
           .semaphores = a.semaphores,
@@ -178,6 +178,7 @@ Platform LinuxPlatform::platform(Metricon& metricon, Energybook& energybook, Dia
           .chanmeter = a.chanmeter,
           .commands = a.commands,
           .threads = a.threads,
+          .journal = &journal,
           .logsDirectory = a.logsDirectory,
           .temporaryDirectory = temporaryDirectory()};
 }

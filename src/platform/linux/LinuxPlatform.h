@@ -51,8 +51,8 @@ class LinuxPlatform {
   void restoreRuntimeDirectory();
 
   // The arguments must outlive all users of the result.
-  Platform platform(Metricon& metricon, Energybook& energybook, Diagwire& diagwire, LinkReport& linkReport,
-                    const Tracing& tracing);
+  Platform platform(Clock& clock, Metricon& metricon, Energybook& energybook, Diagwire& diagwire,
+                    LinkReport& linkReport, const Tracing& tracing, Journal& journal);
 
  private:
   struct Adapters;

@@ -14,6 +14,7 @@
 #include "platform/linux/directories/Directories.h"
 #include "platform/linux/tracing/UnavailableTracing.h"
 #include "support/TemporaryDirectory.h"
+#include "support/memory/MemoryJournal.h"
 #include "support/memory/reports/MemoryDiagwire.h"
 #include "support/memory/reports/MemoryEnergybook.h"
 #include "support/memory/reports/MemoryLinkReport.h"
@@ -37,7 +38,9 @@ TEST(LinuxPlatformTest, LooksForEverythingWhereTheDirectoriesSay) {
   MemoryDiagwire diagwire;
   MemoryLinkReport linkReport;
   const Tracing tracing = makeUnavailableTracing("none");
-  const Platform platform = linuxPlatform.platform(metricon, energybook, diagwire, linkReport, tracing);
+  MemoryJournal journal;
+  const Platform platform = linuxPlatform.platform(linuxPlatform.clock(), metricon, energybook, diagwire,
+                                                   linkReport, tracing, journal);
   EXPECT_EQ(platform.deviceFacts.boolean("InternalBuild"), true);
   EXPECT_EQ(platform.preferences.read("com.orvane.test", "a"), Value(1));
   EXPECT_FALSE(platform.preferences.write("com.orvane.test", "b", 2));
@@ -49,6 +52,8 @@ TEST(LinuxPlatformTest, LooksForEverythingWhereTheDirectoriesSay) {
   EXPECT_EQ(&platform.linkReport, &linkReport);
   EXPECT_EQ(&platform.runtrace, tracing.runtrace.get());
   EXPECT_EQ(&platform.kolvi, tracing.kolvi.get());
+  EXPECT_EQ(&platform.clock, &linuxPlatform.clock());
+  EXPECT_EQ(platform.journal, &journal);
 }
 
 // Runs the collectors of every item on this system.
@@ -60,7 +65,9 @@ TEST(LinuxPlatformTest, LeavesEvidenceOfTheSystemWithAStallTrace) {
   MemoryEnergybook energybook;
   MemoryDiagwire diagwire;
   MemoryLinkReport linkReport;
-  const Platform platform = linuxPlatform.platform(metricon, energybook, diagwire, linkReport, tracing);
+  MemoryJournal journal;
+  const Platform platform = linuxPlatform.platform(linuxPlatform.clock(), metricon, energybook, diagwire,
+                                                   linkReport, tracing, journal);
   platform.log.write("com.orvane.tonewerk", "twrs", LogLevel::kError, "a line before");
   platform.whirlcaps.request("com.orvane.tonewerk", "AudioOverloads", "com.example.player", {}, {true, true});
   linuxPlatform.diagnostics().finish(std::chrono::seconds(60));

@@ -38,9 +38,13 @@ bool DaemonProcess::writeConfiguration(const std::string& name, const std::strin
   return static_cast<bool>(std::ofstream(file) << text << std::flush);
 }
 
-bool DaemonProcess::start() {
+bool DaemonProcess::startWithoutWaiting() {
   const ChildCommand command{TONEWERK_DAEMON_PATH, {}, environment_};
-  if (!process_.start(command, directory_.path("output"), directory_.path("log"))) return false;
+  return process_.start(command, directory_.path("output"), directory_.path("log"));
+}
+
+bool DaemonProcess::start() {
+  if (!startWithoutWaiting()) return false;
   waitUntil([this] { return accepts() || !process_.isRunning(); });
   if (accepts()) return true;
   ADD_FAILURE() << "the daemon accepts no connections; its log:\n" << log();

@@ -43,6 +43,8 @@ class DaemonProcess {
   // Starts the daemon and waits until its socket accepts connections. On failure its log is in the test's
   // failure message. May be called again after stop(), with the same directories.
   bool start();
+  // Only starts it.
+  bool startWithoutWaiting();
   // Sends SIGTERM and returns the exit status; none when the daemon did not end in time.
   std::optional<int> stop();
   ChildProcess& process() { return process_; }

@@ -19,6 +19,7 @@ struct Close {
 
 std::vector<nlohmann::json> parsed(const std::vector<std::string>& texts) {
   std::vector<nlohmann::json> found;
+  found.reserve(texts.size());
   for (const std::string& text : texts) found.push_back(nlohmann::json::parse(text, nullptr, false));
   return found;
 }

@@ -23,12 +23,11 @@ class RecordedEvents {
   std::vector<nlohmann::json> rtcMessages() const;
   // The result of the database's integrity check; "ok" when it is sound.
   std::string integrity() const;
-
- private:
   // The first column of all rows of `query`.
   std::vector<std::string> texts(const std::string& query,
                                  const std::optional<std::string>& argument = {}) const;
 
+ private:
   const std::string path_;
 };
 

@@ -28,6 +28,10 @@ void ServiceManager::tellReloading() const {
   tell("RELOADING=1\nMONOTONIC_USEC=" + std::to_string(microseconds));
 }
 
+void ServiceManager::tellProgress(const std::string& status, std::chrono::microseconds step) const {
+  tell("EXTEND_TIMEOUT_USEC=" + std::to_string(step.count()) + "\nSTATUS=" + status);
+}
+
 // If a ping arrives after the manager has told the daemon to end, the manager starts the watchdog again, and
 // no more pings follow. A timeout of 0 switches the watchdog off.
 void ServiceManager::tellStopping(const std::string& status) const {

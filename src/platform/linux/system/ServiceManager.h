@@ -23,6 +23,9 @@ class ServiceManager {
   // Says that the daemon reads its configuration again. tellReady() ends that state.
   void tellReloading() const;
 
+  // Says what the daemon does before it is ready, and that the next part may take `step`.
+  void tellProgress(const std::string& status, std::chrono::microseconds step) const;
+
   // Says that the daemon is ending. From then on the manager expects no more pings.
   void tellStopping(const std::string& status) const;
 
