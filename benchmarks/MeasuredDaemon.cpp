@@ -38,8 +38,10 @@ MeasuredDaemon::MeasuredDaemon(const std::string& program, const DaemonSettings&
     : settings_(settings) {
   const std::string directory = server_.configurationDirectory();
   if (settings.writesFiles) std::ofstream(directory + "/device-facts.toml") << "InternalBuild = true\n";
+  std::filesystem::create_directory(directory + "/preferences");
+  std::ofstream(directory + "/preferences/com.orvane.tonewerk.store.toml")
+      << "journal_megabytes = " << settings.journalMegabytes << "\n";
   if (!settings.records) {
-    std::filesystem::create_directory(directory + "/preferences");
     std::ofstream(directory + "/preferences/com.orvane.metricon.toml") << "consumers = []\n";
     std::ofstream(directory + "/preferences/com.orvane.linkreport.toml") << "backends = []\n";
   }

@@ -15,6 +15,8 @@ struct DaemonSettings {
   bool records = true;
   // As on internal builds, each session gets a summary file at its stop.
   bool writesFiles = false;
+  // The most that requests take which are kept, so that sessions outlive a crash. 0: none is kept.
+  std::size_t journalMegabytes = 64;
 };
 
 // Runs a daemon in a directory of its own. Failures throw std::runtime_error.

@@ -29,6 +29,7 @@ constexpr Pace kWriteEach{256, 1};
 constexpr Pace kManyAWrite{256, 64};
 constexpr DaemonSettings kRecording{};
 constexpr DaemonSettings kNotRecording{.records = false};
+constexpr DaemonSettings kKeepingNoRequests{.journalMegabytes = 0};
 constexpr DaemonSettings kWritingFiles{.records = false, .writesFiles = true};
 
 // Before a measurement, so that memory and tables that are made once are there.
@@ -150,6 +151,23 @@ double stopCost(const std::string& program, const DaemonSettings& settings, cons
   return time.count() / static_cast<double>(clients.stored());
 }
 
+// Returns seconds from the crash until the next daemon has reported all sessions and answers.
+double recoveryTime(const std::string& program, const MessageLoad& load) {
+  constexpr std::size_t kEnough = 4'096;
+  MeasuredDaemon daemon(program, {.journalMegabytes = kEnough});
+  IngestClients clients(daemon.server().socketPath(), plansOf(load), kMeasuredService);
+  clients.send(load.messages / load.clients + 1, load.pace);
+  const auto begin = std::chrono::steady_clock::now();
+  daemon.server().crash(program);
+  const IngestClients next(daemon.server().socketPath(), plansOf({.sessions = 1}), kMeasuredService);
+  const Seconds time = std::chrono::steady_clock::now() - begin;
+  const std::string clientsRecovered = "sessions of " + std::to_string(load.clients) + " clients recovered";
+  if (daemon.server().output().find(clientsRecovered) == std::string::npos) {
+    throw std::runtime_error("the sessions are not recovered:\n" + daemon.server().output());
+  }
+  return time.count();
+}
+
 double roundTrip99(const std::string& program, std::size_t messages) {
   const MeasuredDaemon daemon(program, kRecording);
   const std::vector<IngestClientPlan> plans = plansOf({});
@@ -195,6 +213,16 @@ void addJournal(std::vector<PathMeasure>& all, const PathEffort& effort) {
   const MessageLoad each{.pace = kWriteEach, .messages = effort.of(200'000)};
   all.push_back({"on_write_each_us", "recording on, a write each", "us", 0,
                  [each](const std::string& daemon) { return costOf(daemon, kRecording, each); }, nullptr});
+  const MessageLoad many{.pace = kManyAWrite, .messages = effort.of(200'000)};
+  for (const auto& [key, what, aim, load] :
+       {std::tuple{"kept_us", "recording on, 64 a write, what keeping requests adds", 0.15, many},
+        std::tuple{"kept_write_each_us", "the same, a write each", 0.0, each}}) {
+    all.push_back({key, what, "us", aim,
+                   [load = load](const std::string& daemon) {
+                     return costOf(daemon, kRecording, load) - costOf(daemon, kKeepingNoRequests, load);
+                   },
+                   nullptr});
+  }
   const std::string problem = JournalProcess::problem();
   const std::size_t entries = effort.of(50'000);
   all.push_back({"on_over_journal", "recording on, a write each, over the journal", "", 0.17,
@@ -248,6 +276,15 @@ void addMemoryAndStop(std::vector<PathMeasure>& all, const PathEffort& effort) {
                  nullptr});
 }
 
+void addRecovery(std::vector<PathMeasure>& all, const PathEffort& effort) {
+  const MessageLoad load{.clients = kSessionClients,
+                         .sessions = effort.of(10'000),
+                         .pace = kManyAWrite,
+                         .messages = effort.of(1'000'000)};
+  all.push_back({"recovery_s", "after a crash with 10,000 sessions, 1,000,000 messages", "s", 0,
+                 [load](const std::string& daemon) { return recoveryTime(daemon, load); }, nullptr});
+}
+
 void addSingle(std::vector<PathMeasure>& all, const PathEffort& effort) {
   all.push_back(
       {"round_trip_p99_ms", "round trip in a flood, 99th percentile", "ms", 0.3,
@@ -295,6 +332,7 @@ std::vector<PathMeasure> pathMeasures(const PathEffort& effort, const std::strin
   addJournal(all, effort);
   addGrowth(all, effort);
   addMemoryAndStop(all, effort);
+  addRecovery(all, effort);
   addSingle(all, effort);
   addHostile(all, effort);
   return all;

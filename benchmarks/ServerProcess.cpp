@@ -70,6 +70,19 @@ ServerProcess::~ServerProcess() {
 
 void ServerProcess::start(const std::string& program, const std::vector<std::string>& arguments,
                           const std::string& socket) {
+  run(program, arguments, socket);
+  waitUntilIdle();
+}
+
+void ServerProcess::crash(const std::string& program) {
+  ::kill(process_, SIGKILL);
+  ::waitpid(process_, nullptr, 0);
+  std::filesystem::remove(socketPath());
+  run(program, {}, kSocket);
+}
+
+void ServerProcess::run(const std::string& program, const std::vector<std::string>& arguments,
+                        const std::string& socket) {
   ::setenv("RUNTIME_DIRECTORY", directory_.c_str(), 1);
   ::setenv("STATE_DIRECTORY", stateDirectory().c_str(), 1);
   ::setenv("LOGS_DIRECTORY", logsDirectory().c_str(), 1);
@@ -88,7 +101,6 @@ void ServerProcess::start(const std::string& program, const std::vector<std::str
     if (std::chrono::steady_clock::now() > deadline) failWithOutput(program + " does not listen");
     std::this_thread::sleep_for(kStep);
   }
-  waitUntilIdle();
 }
 
 ServerProcess::Processor ServerProcess::processorTime() const {

@@ -40,6 +40,9 @@ class ServerProcess {
   // listens at socketPath(), or at `socket` in the directory.
   void start(const std::string& program, const std::vector<std::string>& arguments,
              const std::string& socket = kSocket);
+  // Kills the server, as a crash would end it, and starts it again with the same directories. Returns when
+  // the new one listens, which may be before it answers.
+  void crash(const std::string& program);
 
   // Processor time of all its threads, in user and kernel mode.
   Processor processorTime() const;
@@ -62,6 +65,7 @@ class ServerProcess {
   [[noreturn]] void failWithOutput(const std::string& what) const;
   bool hasEnded();
   void stop();
+  void run(const std::string& program, const std::vector<std::string>& arguments, const std::string& socket);
   // Outside of the directory, in which the server may watch every change.
   std::string outputPath() const { return directory_ + ".output"; }
 
