@@ -52,6 +52,7 @@
 #include "platform/linux/system/Heartbeats.h"
 #include "platform/linux/system/ServiceManager.h"
 #include "platform/linux/system/WatchdogFeeder.h"
+#include "platform/linux/threads/WakingClock.h"
 #include "platform/linux/tracing/Tracing.h"
 #include "platform/linux/tracing/TracingSetup.h"
 #include "protocol/Requests.h"
@@ -162,7 +163,7 @@ class Daemon {
         heartbeats_(log),
         attempts_(directories.state + "/journal", log),
         segments_(directories.state + "/journal", linux.preferences(), log),
-        store_(directories.state, linux.json(), linux.preferences(), linux.clock(), linux.accounts(), log, {},
+        store_(directories.state, linux.json(), linux.preferences(), storeClock_, linux.accounts(), log, {},
                [this] { writeJournal(); }),
         metricon_(store_, linux.preferences(), clock_, log),
         energybook_(store_, clock_),
@@ -388,6 +389,7 @@ class Daemon {
   RecoveryAttempts attempts_;
   SegmentJournal segments_;
   BatchedJournal journal_{segments_};  // outlives the store's thread, and the listeners
+  WakingClock storeClock_;
   ReportStore store_;
   StoreMetricon metricon_;
   StoreEnergybook energybook_;

@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <cassert>
 #include <cerrno>
+#include <cmath>
 #include <fcntl.h>
 #include <pthread.h>
 #include <unistd.h>
@@ -191,6 +192,7 @@ bool ReportStore::write() {
 StoreDatabase::Result ReportStore::writeOrBeginAnew() {
   if (beforeWriting_) beforeWriting_();
   const StoreDatabase::Result result = database_.write(batch_);
+  logJump();
   if (result != StoreDatabase::Result::kCorrupt) return result;
   return moveAside() ? database_.write(batch_) : StoreDatabase::Result::kFailed;
 }
@@ -206,7 +208,7 @@ void ReportStore::trim() {
   const bool wasTrimming = std::exchange(moreToTrim_, false);
   StoreDatabase::Result result = database_.trimSize(moreToTrim_);
   if (result == StoreDatabase::Result::kDone && (ageDue || wasTrimming)) {
-    result = database_.trimAge(clock_.now(), moreToTrim_);
+    result = database_.trimAge(moreToTrim_);
   }
   if (result == StoreDatabase::Result::kDone) {
     loggedTrimProblem_.clear();
@@ -255,6 +257,13 @@ double ReportStore::bound(std::string_view key, double otherwise, std::string& w
   if (isNumber(*value) && value->number() >= 1.0) return std::min(value->number(), kUnbounded);
   wrong += " " + std::string(key) + " = " + value->text();
   return otherwise;
+}
+
+void ReportStore::logJump() {
+  const double jump = database_.takeJump();
+  if (jump == 0.0) return;
+  defaultLog(log_, "the wall clock jumped %s by %lli s; the age of what is stored does not follow it",
+             jump > 0.0 ? "forward" : "back", std::llround(std::fabs(jump)));
 }
 
 void ReportStore::logFailure() {

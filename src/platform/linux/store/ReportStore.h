@@ -42,7 +42,8 @@ class PreferenceStore;
 //
 // The bounds are the preferences "max_megabytes" (256) and "max_days" (30) of the domain
 // "com.orvane.tonewerk.store". They are read again every ten seconds while there is something to write, and
-// when readBoundsAgain() asks for it. Rows that are too old are deleted then.
+// when readBoundsAgain() asks for it. Rows that are too old are deleted then; their age follows the monotonic
+// clock (StoreAge).
 class ReportStore {
  public:
   static constexpr std::string_view kPreferenceDomain = "com.orvane.tonewerk.store";
@@ -51,10 +52,11 @@ class ReportStore {
 
   using Limits = StoreQueue::Limits;
 
-  // The file is in `directory`, which is made when it is missing. All references outlive the store. In
-  // `accounts` the total of Resource::kSinkBytes becomes that of `limits`, and the total of kStoredBytes the
-  // bound of size. The store's thread calls `beforeWriting` before each transaction, unless it is empty: what
-  // rows came from must outlive a crash not less than the rows.
+  // The file is in `directory`, which is made when it is missing. All references outlive the store. The
+  // monotonic time of `clock` goes on while the device sleeps (WakingClock), or rows would not grow older
+  // then. In `accounts` the total of Resource::kSinkBytes becomes that of `limits`, and the total of
+  // kStoredBytes the bound of size. The store's thread calls `beforeWriting` before each transaction, unless
+  // it is empty: what rows came from must outlive a crash not less than the rows.
   ReportStore(const std::string& directory, const JsonService& json, const PreferenceStore& preferences,
               const Clock& clock, Accounts& accounts, const LogCategory& log, const Limits& limits = {},
               std::function<void()> beforeWriting = {});
@@ -127,6 +129,7 @@ class ReportStore {
   void chargeStored();
   void readBounds();
   double bound(std::string_view key, double otherwise, std::string& wrong) const;
+  void logJump();
   void logFailure();
   void logSuccess(std::uint64_t dropped);
 

@@ -22,12 +22,15 @@ StoreDatabase::StoreDatabase(std::string directory, const JsonService& json, con
     : directory_(std::move(directory)),
       path_(directory_ + "/" + std::string(kStoreFileName)),
       json_(json),
-      clock_(clock) {}
+      clock_(clock),
+      age_(database_, clock) {}
 
 StoreDatabase::Result StoreDatabase::write(const StoreBatch& batch) {
   if (database_.isOpen() && database_.hasMoved()) close();
   const Result opened = open();
-  if (opened != Result::kDone || batch.empty()) return opened;
+  if (opened != Result::kDone) return opened;
+  if (!age_.follow(bounds_.seconds)) return fail();
+  if (batch.empty()) return opened;
   holdings_.begin();
   if (!begin_.run() || !insert(batch) || !commit_.run()) return fail();
   holdings_.commit();
@@ -50,9 +53,11 @@ void StoreDatabase::setBounds(const StoreBounds& bounds) {
   if (database_.isOpen()) applyBounds();
 }
 
-StoreDatabase::Result StoreDatabase::trimAge(double now, bool& moreToDo) {
+StoreDatabase::Result StoreDatabase::trimAge(bool& moreToDo) {
   if (!database_.isOpen()) return Result::kDone;
-  return resultOf(trimmer_->trimAge(bounds_, now), moreToDo);
+  const std::optional<StoreRowIds> old = age_.olderThan(bounds_.seconds);
+  if (!old) return fail();
+  return resultOf(trimmer_->trimAge(*old), moreToDo);
 }
 
 StoreDatabase::Result StoreDatabase::trimSize(bool& moreToDo) {
@@ -93,6 +98,7 @@ StoreDatabase::Result StoreDatabase::open() {
   if (*version == 0 && !prepareFile()) return fail();
   if (*version == 1 && !database_.run(storeMigration())) return fail();
   if (*version == kStoreSchemaVersion && !addUserColumns()) return fail();
+  if (*version == kStoreSchemaVersion && !addAgeTables()) return fail();
   // With this a commit costs no sync; each checkpoint makes one. A power cut loses the newest rows.
   if (!database_.run("PRAGMA journal_mode = WAL; PRAGMA synchronous = NORMAL;"
                      " PRAGMA temp_store = MEMORY")) {
@@ -108,16 +114,20 @@ StoreDatabase::Result StoreDatabase::open() {
   rtc_.emplace(database_, json_, fileNumber_);
   marks_.emplace(database_);
   trimmer_.emplace(database_, holdings_, clock_);
-  recognizeFile();
+  const bool isKnown = recognizeFile();
+  if (!age_.open(isKnown)) return fail();
   return Result::kDone;
 }
 
-void StoreDatabase::recognizeFile() {
+bool StoreDatabase::recognizeFile() {
   struct stat status {};
-  const bool isKnown = ::stat(path_.c_str(), &status) == 0;
-  if (!isKnown || status.st_dev != device_ || status.st_ino != inode_) holdings_.forget();
+  const bool isKnown = ::stat(path_.c_str(), &status) == 0 && fileNumber_ == openedNumber_ &&
+                       status.st_dev == device_ && status.st_ino == inode_;
+  if (!isKnown) holdings_.forget();
+  openedNumber_ = fileNumber_;
   device_ = status.st_dev;
   inode_ = status.st_ino;
+  return isKnown;
 }
 
 bool StoreDatabase::prepareFile() {
@@ -136,6 +146,12 @@ bool StoreDatabase::addUserColumns() {
       database_.number("SELECT count(*) FROM pragma_table_info('analytics_row') WHERE name = 'user_id'");
   if (!columns) return false;
   return *columns > 0 || database_.run(storeUserColumns());
+}
+
+bool StoreDatabase::addAgeTables() {
+  const auto ages = database_.number("SELECT count(*) FROM sqlite_master WHERE name = 'age_clock'");
+  if (!ages) return false;
+  return *ages > 0 || database_.run(storeAgeTables());
 }
 
 void StoreDatabase::applyBounds() {

@@ -11,6 +11,7 @@
 #include "platform/linux/store/PowerTable.h"
 #include "platform/linux/store/RtcTable.h"
 #include "platform/linux/store/SqliteDatabase.h"
+#include "platform/linux/store/StoreAge.h"
 #include "platform/linux/store/StoreBatch.h"
 #include "platform/linux/store/StoreHoldings.h"
 #include "platform/linux/store/StoreMarks.h"
@@ -42,13 +43,15 @@ class StoreDatabase {
   [[nodiscard]] Result write(const StoreBatch& batch);
   // The bounds of the next trims and of the write-ahead log.
   void setBounds(const StoreBounds& bounds);
-  // Deletes rows that are too old at `now`, or enough rows to keep the file's size, in one slice of work.
-  // Sets `moreToDo` when another slice is needed. Does nothing while the file is closed.
-  [[nodiscard]] Result trimAge(double now, bool& moreToDo);
+  // Deletes rows that are too old, or enough rows to keep the file's size, in one slice of work. Sets
+  // `moreToDo` when another slice is needed. Does nothing while the file is closed.
+  [[nodiscard]] Result trimAge(bool& moreToDo);
   [[nodiscard]] Result trimSize(bool& moreToDo);
   // What the rows of a user count (StoreHolding). 0 before the first trimSize(), which reads the rows that
   // were there.
   std::int64_t bytesOf(std::uint32_t user) const { return holdings_.of(user); }
+  // By how many seconds the wall clock has jumped since the last call; mostly 0.
+  double takeJump() { return age_.takeJump(); }
   // Renames the file and its side files to "<path>.corrupt...", and replaces those of an earlier time. On
   // failure it is false, and problem() describes it.
   [[nodiscard]] bool moveAside();
@@ -62,10 +65,11 @@ class StoreDatabase {
   [[nodiscard]] bool prepareFile();
   // When they are missing, since an earlier daemon made the file.
   [[nodiscard]] bool addUserColumns();
+  [[nodiscard]] bool addAgeTables();
   [[nodiscard]] bool insert(const StoreBatch& batch);
   void applyBounds();
-  // Forgets what users hold when the path has another file than before.
-  void recognizeFile();
+  // Whether the path has the same file as before. Forgets what users hold if not.
+  [[nodiscard]] bool recognizeFile();
   [[nodiscard]] Result resultOf(StoreTrimmer::Outcome outcome, bool& moreToDo);
   [[nodiscard]] Result fail();
   [[nodiscard]] Result failWith(std::string problem);
@@ -78,6 +82,7 @@ class StoreDatabase {
   const Clock& clock_;
   SqliteDatabase database_;
   StoreHoldings holdings_{database_};
+  StoreAge age_;
   // Have a value while the file is open.
   SqliteStatement begin_;
   SqliteStatement commit_;
@@ -91,6 +96,7 @@ class StoreDatabase {
   // Numbers the files that this process began or found; this is the open one's number.
   std::uint64_t fileNumber_ = 1;
   // Identify the file that was opened last.
+  std::uint64_t openedNumber_ = 0;
   dev_t device_ = 0;
   ino_t inode_ = 0;
   StoreBounds bounds_;

@@ -30,6 +30,16 @@ constexpr std::string_view kTables = R"(
     user_id INTEGER);
 )";
 
+// How old the rows are: see StoreAge. A mark names the newest row of each table.
+constexpr std::string_view kAgeTables = R"(
+  CREATE TABLE age_mark (
+    id INTEGER PRIMARY KEY, age REAL NOT NULL, time_off REAL NOT NULL,
+    analytics_row INTEGER NOT NULL, metric INTEGER NOT NULL, power_event INTEGER NOT NULL,
+    rtc_session INTEGER NOT NULL, rtc_row INTEGER NOT NULL);
+  CREATE TABLE age_clock (
+    id INTEGER PRIMARY KEY, age REAL NOT NULL, wall REAL NOT NULL, uptime REAL NOT NULL);
+)";
+
 // CROSS JOIN keeps the rows outermost. So events come in the order of their identifiers and are not sorted.
 constexpr std::string_view kAnalyticsView = R"(
   CREATE VIEW analytics_event (id, recorded_at, name, payload) AS
@@ -77,6 +87,7 @@ std::string inTransaction(const std::string& sql) {
 
 std::string storeSchema() {
   std::string sql(kTables);
+  sql += kAgeTables;
   sql += kAnalyticsView;
   sql += kRtcView;
   return inTransaction(sql);
@@ -85,10 +96,13 @@ std::string storeSchema() {
 std::string storeMigration() {
   std::string sql(kFromVersion1);
   sql += userColumns();
+  sql += kAgeTables;
   sql += kRtcView;
   return inTransaction(sql);
 }
 
 std::string storeUserColumns() { return inTransaction(userColumns()); }
+
+std::string storeAgeTables() { return inTransaction(std::string(kAgeTables)); }
 
 }  // namespace tonewerk

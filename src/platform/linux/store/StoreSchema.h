@@ -49,6 +49,9 @@ inline constexpr std::array<StoreTable, 5> kStoreTables{{
     {"rtc_row", "sent_at", "length(CAST(payload AS BLOB))", "payload = '{}'"},
 }};
 
+// An identifier for each of kStoreTables.
+using StoreRowIds = std::array<std::int64_t, kStoreTables.size()>;
+
 // What a row counts beside its `bytes`: about the bytes of its identifier and its other columns.
 inline constexpr std::int64_t kStoreRowBytes = 32;
 
@@ -62,5 +65,8 @@ std::string storeMigration();
 // The SQL that gives the tables of an earlier file of this version the column with the user, in one
 // transaction that writes few pages. Programs that do not know the column can read and write the file.
 std::string storeUserColumns();
+
+// The SQL that makes the tables of StoreAge in an earlier file of this version, in one transaction.
+std::string storeAgeTables();
 
 }  // namespace tonewerk

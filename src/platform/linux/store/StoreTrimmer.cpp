@@ -68,14 +68,36 @@ struct RoundBudget {
   }
 };
 
+// For each mark of age, from the oldest on, the newest rows that it or an older one covers.
+using CoveredRows = std::vector<StoreRowIds>;
+
+std::optional<CoveredRows> readCoveredRows(SqliteDatabase& database) {
+  std::string sql = "SELECT ";
+  for (const StoreTable& table : kStoreTables) sql.append(table.name).append(", ");
+  SqliteStatement select = database.prepare(sql + "age FROM age_mark ORDER BY age");
+  CoveredRows covered;
+  SqliteStatement::Step step = SqliteStatement::Step::kDone;
+  while ((step = select.step()) == SqliteStatement::Step::kRow) {
+    StoreRowIds rows = covered.empty() ? StoreRowIds{} : covered.back();
+    for (std::size_t table = 0; table < rows.size(); ++table) {
+      rows[table] = std::max(rows[table], select.integer(static_cast<int>(table)));
+    }
+    covered.push_back(rows);
+  }
+  if (step == SqliteStatement::Step::kFailed) return std::nullopt;
+  return covered;
+}
+
 // Walks through the rows of one user in one table, from the oldest on. The rows of other users between them
 // are looked at, too, because there is no index by user: it would cost every commit another page.
 class OldestRows {
  public:
-  // `newest` is the highest identifier of the table.
-  OldestRows(SqliteDatabase& database, const StoreTable& table, std::uint32_t user, std::int64_t from,
-             std::int64_t newest)
-      : user_(user), from_(from) {
+  // `newest` is the highest identifier of the table, which is the one at `place` of kStoreTables. `covered`
+  // outlives it.
+  OldestRows(SqliteDatabase& database, std::size_t place, std::uint32_t user, std::int64_t from,
+             std::int64_t newest, const CoveredRows& covered)
+      : user_(user), place_(place), covered_(&covered), from_(from) {
+    const StoreTable& table = kStoreTables[place];
     if (from > newest) return;
     select_ = database.prepare(
         oldestRows(table, "id, " + std::string(table.time) + ", " + std::string(table.bytes) + ", user_id"));
@@ -95,7 +117,10 @@ class OldestRows {
   }
   bool hasFailed() const { return at_ == SqliteStatement::Step::kFailed; }
   bool hasRow() const { return at_ == SqliteStatement::Step::kRow; }
-  double time() const { return select_.number(1); }
+  // The wall clock may jump, so the marks of age decide. Times order only what no mark separates.
+  bool isOlderThan(const OldestRows& other) const {
+    return mark_ != other.mark_ ? mark_ < other.mark_ : time() < other.time();
+  }
 
   // Moves to the next row of any user, and marks the current one for deletion. Returns the bytes that the
   // current row counts.
@@ -117,13 +142,19 @@ class OldestRows {
   std::int64_t from() const { return from_; }
 
  private:
+  double time() const { return select_.number(1); }
   std::int64_t bytes() const { return select_.integer(2) + kStoreRowBytes; }
   void step() {
     if (at_ == SqliteStatement::Step::kRow) from_ = select_.integer(0) + 1;
     at_ = select_.step();
+    if (at_ != SqliteStatement::Step::kRow) return;
+    while (mark_ < covered_->size() && (*covered_)[mark_][place_] < select_.integer(0)) ++mark_;
   }
 
   const std::uint32_t user_;
+  const std::size_t place_;
+  const CoveredRows* const covered_;
+  std::size_t mark_ = 0;  // the first one that covers the row
   std::int64_t from_;
   SqliteStatement select_;
   SqliteStatement::Step at_ = SqliteStatement::Step::kDone;
@@ -139,11 +170,12 @@ using NewestIds = std::array<std::int64_t, kStoreTables.size()>;
 // A user whose oldest rows are deleted in one round.
 class OldestRowsOfUser {
  public:
-  OldestRowsOfUser(SqliteDatabase& database, StoreHolding& holding, const NewestIds& newest)
+  OldestRowsOfUser(SqliteDatabase& database, StoreHolding& holding, const NewestIds& newest,
+                   const CoveredRows& covered)
       : holding_(&holding), left_(holding.bytes) {
     tables_.reserve(kStoreTables.size());
     for (std::size_t at = 0; at < kStoreTables.size(); ++at) {
-      tables_.emplace_back(database, kStoreTables[at], holding.user, holding.from[at], newest[at]);
+      tables_.emplace_back(database, at, holding.user, holding.from[at], newest[at], covered);
     }
   }
 
@@ -159,7 +191,7 @@ class OldestRowsOfUser {
     OldestRows* oldest = nullptr;
     for (OldestRows& table : tables_) {
       if (!table.find(budget)) return 0;
-      if (table.hasRow() && (oldest == nullptr || table.time() < oldest->time())) oldest = &table;
+      if (table.hasRow() && (oldest == nullptr || table.isOlderThan(*oldest))) oldest = &table;
     }
     isDone_ = oldest == nullptr;
     if (isDone_ || budget.isUsedUp()) return 0;
@@ -233,10 +265,10 @@ StoreTrimmer::StoreTrimmer(SqliteDatabase& database, StoreHoldings& holdings, co
   }
 }
 
-StoreTrimmer::Outcome StoreTrimmer::trimAge(const StoreBounds& bounds, double now) {
+StoreTrimmer::Outcome StoreTrimmer::trimAge(const StoreRowIds& old) {
   const std::chrono::nanoseconds end = clock_.monotonic() + kSliceTime;
   for (int round = 0; round < kRoundsPerSlice; ++round) {
-    const std::int64_t deleted = deleteUpTo(now - bounds.seconds);
+    const std::int64_t deleted = deleteUpTo(old);
     if (deleted < 0) return Outcome::kFailed;
     if (deleted == 0) return Outcome::kDone;
     if (clock_.monotonic() >= end) break;
@@ -311,17 +343,18 @@ bool StoreTrimmer::commit() {
   return true;
 }
 
-// Deletes, of the oldest chunk of every table, the rows that are not younger than `time`. Returns the number
-// of rows, or a negative number on failure.
-std::int64_t StoreTrimmer::deleteUpTo(double time) {
+// Deletes, of the oldest chunk of every table, the rows up to that of `old`. Returns the number of rows, or a
+// negative number on failure.
+std::int64_t StoreTrimmer::deleteUpTo(const StoreRowIds& old) {
   if (!begin()) return -1;
   std::int64_t deleted = 0;
-  for (const StoreTable& table : kStoreTables) {
-    SqliteStatement statement = database_.prepare(
-        "DELETE FROM " + std::string(table.name) + " WHERE " + std::string(table.time) +
-        " <= ?2 AND id IN (" + oldestChunk(table) + ") RETURNING user_id, " + std::string(table.bytes));
+  for (std::size_t at = 0; at < old.size(); ++at) {
+    const StoreTable& table = kStoreTables[at];
+    SqliteStatement statement =
+        database_.prepare("DELETE FROM " + std::string(table.name) + " WHERE id <= ?2 AND id IN (" +
+                          oldestChunk(table) + ") RETURNING user_id, " + std::string(table.bytes));
     statement.bind(1, std::int64_t{0});
-    statement.bind(2, time);
+    statement.bind(2, old[at]);
     SqliteStatement::Step step = SqliteStatement::Step::kDone;
     while ((step = statement.step()) == SqliteStatement::Step::kRow) {
       holdings_.removeRow(userOf(statement, 0), statement.integer(1));
@@ -378,6 +411,8 @@ std::int64_t StoreTrimmer::deleteOldest(std::int64_t bytes) {
     if (!found) return -1;
     newest[at] = *found;
   }
+  const std::optional<CoveredRows> covered = readCoveredRows(database_);
+  if (!covered) return -1;
   // Those without a number in `users` have lost nothing in this round.
   struct Candidate {
     std::int64_t left;
@@ -401,7 +436,7 @@ std::int64_t StoreTrimmer::deleteOldest(std::int64_t bytes) {
     candidates.pop();
     if (candidate.user == kNotYet) {
       candidate.user = users.size();
-      users.emplace_back(database_, all[candidate.holding], newest);
+      users.emplace_back(database_, all[candidate.holding], newest, *covered);
     }
     OldestRowsOfUser& largest = users[candidate.user];
     const std::int64_t second = candidates.empty() ? 0 : candidates.top().left;

@@ -7,6 +7,7 @@
 #include <optional>
 
 #include "platform/linux/store/SqliteDatabase.h"
+#include "platform/linux/store/StoreAge.h"
 #include "platform/linux/store/StoreHoldings.h"
 
 namespace tonewerk {
@@ -43,9 +44,8 @@ struct RowRange {
 // it has freed kLeastPerSlice, which is more than a batch of rows adds.
 //
 // At its bound the file keeps its size: new rows take the pages of deleted ones, and the pages in use are
-// between nine tenths of the bound and all of it, unless a single row is larger than the difference. For the
-// bound of age only the oldest rows are checked: rows recorded while the clock was ahead can hold back the
-// rows behind them until they are old enough themselves.
+// between nine tenths of the bound and all of it, unless a single row is larger than the difference. How old
+// rows are, StoreAge says, not their times.
 class StoreTrimmer {
  public:
   enum class Outcome { kDone, kMoreToDo, kFailed };
@@ -57,8 +57,8 @@ class StoreTrimmer {
   // After a failure the caller undoes the transactions of both.
   StoreTrimmer(SqliteDatabase& database, StoreHoldings& holdings, const Clock& clock);
 
-  // One slice of deleting for age; `now` is in seconds since 1970. On failure the database has the problem.
-  [[nodiscard]] Outcome trimAge(const StoreBounds& bounds, double now);
+  // One slice of deleting for age: the rows up to these. On failure the database has the problem.
+  [[nodiscard]] Outcome trimAge(const StoreRowIds& old);
   // One slice of deleting for size, after the holdings were read. It costs little when there is nothing to
   // do, so it can follow every batch.
   [[nodiscard]] Outcome trimSize(const StoreBounds& bounds);
@@ -69,7 +69,7 @@ class StoreTrimmer {
   [[nodiscard]] bool measure();
   [[nodiscard]] bool begin();
   [[nodiscard]] bool commit();
-  [[nodiscard]] std::int64_t deleteUpTo(double time);
+  [[nodiscard]] std::int64_t deleteUpTo(const StoreRowIds& old);
   [[nodiscard]] std::int64_t deleteOldest(std::int64_t bytes);
   [[nodiscard]] bool deleteRows(const StoreTable& table, std::uint32_t user, const RowRange& rows);
   [[nodiscard]] bool closeGaps(const StoreTable& table, const RowRange& rows);
