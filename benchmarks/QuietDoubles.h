@@ -49,7 +49,8 @@ class RunningClock final : public Clock {
 
 class CountingMetricon final : public Metricon {
  public:
-  void sendEvent(const EventNames& names, FunctionRef<ValueMap()> payload) override {
+  void sendEvent(const EventNames& names, const EventSubject& /*subject*/,
+                 FunctionRef<ValueMap()> payload) override {
     benchmark::DoNotOptimize(payload());
     events += names.second.empty() ? 1 : 2;
   }

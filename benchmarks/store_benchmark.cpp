@@ -124,7 +124,7 @@ void RecordEvents(benchmark::State& state) {
   const double before = threadNanoseconds();
   for (auto _ : state) {
     const ValueMap& event = events[at % events.size()];
-    store.metricon.sendEvent(names[at % names.size()], [&event] { return event; });
+    store.metricon.sendEvent(names[at % names.size()], {}, [&event] { return event; });
     ++at;
     if (at % 65'536 == 0) benchmark::DoNotOptimize(store.store.flush(kLongEnough));
   }
@@ -148,7 +148,7 @@ void RecordAtTheBound(benchmark::State& state) {
   for (auto _ : state) {
     const WorkingFor scope(users[at / 64 % users.size()]);
     const ValueMap& event = events[at % events.size()];
-    store.metricon.sendEvent(names[at % names.size()], [&event] { return event; });
+    store.metricon.sendEvent(names[at % names.size()], {}, [&event] { return event; });
     ++at;
     if (at % 65'536 == 0) benchmark::DoNotOptimize(store.store.flush(kLongEnough));
   }
@@ -194,7 +194,7 @@ void RecordMessages(benchmark::State& state) {
   const double before = threadNanoseconds();
   for (auto _ : state) {
     const ValueMap& event = events[at % events.size()];
-    store.metricon.sendEvent(names[at % names.size()], [&event] { return event; });
+    store.metricon.sendEvent(names[at % names.size()], {}, [&event] { return event; });
     store.store.record(RtcMessageRow{store.clock.now(), session, 4, 1, event, "timestamp"});
     ++at;
     if (at % 65'536 == 0) benchmark::DoNotOptimize(store.store.flush(kLongEnough));
@@ -211,7 +211,7 @@ void RecordUnusedEvents(benchmark::State& state) {
   store.preferences.configure("com.orvane.metricon", "consumers", ValueArray{});
   const std::vector<EventNames> names = kinds();
   std::size_t at = 0;
-  for (auto _ : state) store.metricon.sendEvent(names[at++ % names.size()], [] { return ValueMap(); });
+  for (auto _ : state) store.metricon.sendEvent(names[at++ % names.size()], {}, [] { return ValueMap(); });
 }
 BENCHMARK(RecordUnusedEvents)->Unit(benchmark::kNanosecond);
 
@@ -225,7 +225,7 @@ void CommitOneEvent(benchmark::State& state) {
   std::size_t at = 0;
   for (auto _ : state) {
     const ValueMap& event = events[at % events.size()];
-    store.metricon.sendEvent(names[at % names.size()], [&event] { return event; });
+    store.metricon.sendEvent(names[at % names.size()], {}, [&event] { return event; });
     ++at;
     benchmark::DoNotOptimize(store.store.flush(kLongEnough));
   }

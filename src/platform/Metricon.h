@@ -2,8 +2,12 @@
 #pragma once
 
 #include <concepts>
+#include <cstdint>
+#include <memory>
+#include <optional>
 #include <utility>
 
+#include "protocol/AudioEvent.h"
 #include "values/FunctionRef.h"
 #include "values/SharedString.h"
 #include "values/Value.h"
@@ -25,6 +29,31 @@ struct EventNames {
   SharedString second;  // empty when the event has one name
 };
 
+struct SessionLife;
+
+enum class EventSource : std::uint8_t {
+  kUnknown,  // the event is no message
+  kClient,   // a client has sent the message
+  kDerived,  // the daemon has made it
+};
+
+// A stretch of time, in seconds since 1970.
+struct TimeStretch {
+  double began = 0.0;
+  double ended = 0.0;
+
+  friend bool operator==(const TimeStretch&, const TimeStretch&) = default;
+};
+
+// What an event is about, kept beside its payload.
+struct EventSubject {
+  AudioEventCategory category = kCategoryUnknown;
+  AudioEventType type = kTypeUnknown;
+  EventSource source = EventSource::kUnknown;  // kUnknown leaves out category and type
+  std::shared_ptr<SessionLife> life = {};      // of the message's session; null for none
+  std::optional<TimeStretch> stretch = {};     // which a summary sums up
+};
+
 // The analytics event service: records named events for consumers that asked for them. Any thread.
 class Metricon {
  public:
@@ -34,7 +63,8 @@ class Metricon {
   // is called once, before sendEvent() returns, and not at all when nobody has asked for any of the names.
   // Waits while the recorder's queue is full, unless nothing can be written (see docs/architecture.md, "Back
   // pressure").
-  virtual void sendEvent(const EventNames& names, FunctionRef<ValueMap()> payload) = 0;
+  virtual void sendEvent(const EventNames& names, const EventSubject& subject,
+                         FunctionRef<ValueMap()> payload) = 0;
 };
 
 }  // namespace tonewerk

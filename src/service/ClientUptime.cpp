@@ -42,7 +42,7 @@ void sendClientUptime(std::int32_t processIdentifier, std::optional<double> star
     infoLog(log, "clientProcessName is nil. clientpid=%d", processIdentifier);
     return;
   }
-  platform.metricon.sendEvent(kClientUptimeEvent, [&] {
+  platform.metricon.sendEvent(kClientUptimeEvent, {}, [&] {
     return ValueMap{{"processName", *processName}, {"seconds", seconds}};
   });
 }

@@ -17,8 +17,8 @@ TWReportingSessionMessage& KeptMessages::add(const TWReportingSessionMessage& me
 std::size_t KeptMessages::bytesFor(const TWReportingSessionMessage& message) const {
   // Twice, because half of the last piece of records may be empty.
   constexpr std::size_t kRecordBytes = 2 * sizeof(TWReportingSessionMessage);
-  constexpr std::size_t kListBytes = 128;  // of destination workers; only producers name them
-  return kRecordBytes + (message.destinationWorkers.empty() ? 0 : kListBytes) +
+  constexpr std::size_t kDetailsBytes = 160;  // only producers give them
+  return kRecordBytes + (message.details.empty() ? 0 : kDetailsBytes) +
          (size() < kFewMessages ? KeptPayloads::heapBytesOf(message.message)
                                 : payloads_.bytesFor(message.message));
 }

@@ -50,10 +50,6 @@ const LogCategory* debugCategory() {
   return category->isEnabled(LogLevel::kDebug) ? category : nullptr;
 }
 
-bool contains(const WorkerClassList& classes, const TWReportingSessionWorkerClass& wanted) {
-  return std::find(classes.begin(), classes.end(), &wanted) != classes.end();
-}
-
 }  // namespace
 
 // Made once, because every session adds the same texts.
@@ -302,7 +298,7 @@ void TWReportingSession::deliver(const TWReportingSessionMessage& message) {
     if (!consumer.worker->started) continue;
     if (message.isRedundant && !consumer.handlesRedundantMessages) continue;
     const TWReportingSessionWorkerClass& workerClass = *consumer.workerClass;
-    if (!message.destinationWorkers.empty() && !contains(message.destinationWorkers, workerClass)) continue;
+    if (!message.details.areMeantFor(workerClass)) continue;
     if (workerClass.handledTypes.contains(message.type)) consumer.worker->handleMessage(message);
     if (debug == nullptr) continue;
     debugLog(debug, "TWReportingSessionWorker action=handleMessage worker=%@ reporterID=%lli", workerClass,

@@ -93,8 +93,10 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   // budget, so that it takes no room from the session's own messages.
   void sendMessage(TWReportingSessionMessage& message, const MessageReply& reply = nullptr,
                    const Sender& sender = nullptr);
+  // The same for a message that the daemon has made.
   void sendMessage(const std::shared_ptr<TWReportingSessionMessage>& message,
                    const MessageReply& reply = nullptr) {
+    message->isDerived = true;
     sendMessage(*message, reply);
   }
 

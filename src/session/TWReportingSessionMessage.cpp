@@ -11,6 +11,8 @@
 
 namespace tonewerk {
 
+const MessageDetails::WorkerClasses MessageDetails::kNoWorkers;
+
 TWReportingSessionMessage::TWReportingSessionMessage(ValueMap payload, AudioEventCategory messageCategory,
                                                      AudioEventType messageType)
     : message(std::move(payload)), category(messageCategory), type(messageType) {}
@@ -20,6 +22,7 @@ std::shared_ptr<TWReportingSessionMessage> TWReportingSessionMessage::copyWithZo
   auto copy = std::make_shared<TWReportingSessionMessage>(message, category, type);
   copy->isRedundant = isRedundant;
   copy->isSessionStarted = isSessionStarted;
+  copy->isDerived = isDerived;
   return copy;
 }
 

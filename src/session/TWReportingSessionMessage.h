@@ -1,13 +1,16 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <algorithm>
 #include <atomic>
 #include <cstddef>
-#include <initializer_list>
 #include <memory>
+#include <optional>
 #include <string>
+#include <utility>
 #include <vector>
 
+#include "platform/Metricon.h"
 #include "protocol/AudioEvent.h"
 #include "values/Value.h"
 
@@ -15,32 +18,48 @@ namespace tonewerk {
 
 struct TWReportingSessionWorkerClass;
 
-// A list of worker classes. It takes one pointer while it is empty, which it is in nearly all messages.
-class WorkerClassList {
+// What few messages have. It takes one pointer while there is nothing.
+class MessageDetails {
  public:
-  using value_type = const TWReportingSessionWorkerClass*;
-  using const_iterator = const value_type*;
+  using WorkerClasses = std::vector<const TWReportingSessionWorkerClass*>;
 
-  WorkerClassList() = default;
-  WorkerClassList(std::initializer_list<value_type> classes)
-      : classes_(classes.size() == 0 ? nullptr : std::make_unique<const std::vector<value_type>>(classes)) {}
-  WorkerClassList(const WorkerClassList& other)
-      : classes_(other.empty() ? nullptr : std::make_unique<const std::vector<value_type>>(*other.classes_)) {
-  }
-  WorkerClassList(WorkerClassList&&) noexcept = default;
-  WorkerClassList& operator=(WorkerClassList other) noexcept {
-    classes_ = std::move(other.classes_);
+  MessageDetails() = default;
+  MessageDetails(const MessageDetails& other)
+      : content_(other.empty() ? nullptr : std::make_unique<Content>(*other.content_)) {}
+  MessageDetails(MessageDetails&&) noexcept = default;
+  MessageDetails& operator=(MessageDetails other) noexcept {
+    content_ = std::move(other.content_);
     return *this;
   }
-  ~WorkerClassList() = default;
+  ~MessageDetails() = default;
 
-  bool empty() const { return classes_ == nullptr; }
-  std::size_t size() const { return empty() ? 0 : classes_->size(); }
-  const_iterator begin() const { return empty() ? nullptr : classes_->data(); }
-  const_iterator end() const { return begin() + size(); }
+  bool empty() const { return content_ == nullptr; }
+
+  // If not empty, only consumers of these classes get the message.
+  const WorkerClasses& destinationWorkers() const { return empty() ? kNoWorkers : content_->workers; }
+  bool areMeantFor(const TWReportingSessionWorkerClass& workerClass) const {
+    const WorkerClasses& workers = destinationWorkers();
+    return workers.empty() || std::find(workers.begin(), workers.end(), &workerClass) != workers.end();
+  }
+  void setDestinationWorkers(WorkerClasses workers) { content().workers = std::move(workers); }
+
+  // What a summary sums up.
+  std::optional<TimeStretch> stretch() const { return empty() ? std::nullopt : content_->stretch; }
+  void setStretch(const TimeStretch& stretch) { content().stretch = stretch; }
 
  private:
-  std::unique_ptr<const std::vector<value_type>> classes_;
+  struct Content {
+    WorkerClasses workers;
+    std::optional<TimeStretch> stretch;
+  };
+  static const WorkerClasses kNoWorkers;
+
+  Content& content() {
+    if (empty()) content_ = std::make_unique<Content>();
+    return *content_;
+  }
+
+  std::unique_ptr<Content> content_;
 };
 
 // Holds one message of a session, which a client sent or the daemon made.
@@ -52,7 +71,7 @@ class TWReportingSessionMessage {
   // The record shares the payload's values, but has a map of its own.
   TWReportingSessionMessage(ValueMap payload, AudioEventCategory messageCategory, AudioEventType messageType);
 
-  // Returns a copy without the destination workers: a copy may go to any worker.
+  // Returns a copy without the details: a copy may go to any worker.
   std::shared_ptr<TWReportingSessionMessage> copyWithZone() const;
 
   // "category=Playback type=Start {...}"
@@ -65,13 +84,13 @@ class TWReportingSessionMessage {
   // the messages were in order.
   static bool sortMessages(std::vector<std::shared_ptr<TWReportingSessionMessage>>& messages);
 
-  // If not empty, only consumers of these classes get the message.
-  WorkerClassList destinationWorkers;
+  MessageDetails details;
   ValueMap message;
   AudioEventCategory category;
   AudioEventType type;
   bool isRedundant : 1 = false;
   bool isSessionStarted : 1 = false;
+  bool isDerived : 1 = false;  // the daemon has made it
 
   // Locks this record. BasicLockable.
   void lock() const;

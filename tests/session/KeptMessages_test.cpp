@@ -39,17 +39,18 @@ TEST_F(KeptMessagesTest, AddsACopyOfAllThatAMessageHas) {
   TWReportingSessionMessage record({{"a", 1}}, 4, 7);
   record.isRedundant = true;
   record.isSessionStarted = true;
-  record.destinationWorkers = {&TWReportingSessionMetriconWorker::kWorkerClass};
+  record.details.setDestinationWorkers({&TWReportingSessionMetriconWorker::kWorkerClass});
   messages.add(record);
   record.message.set("a", 2);
-  record.destinationWorkers = {};
+  record.details.setDestinationWorkers({});
   const auto* kept = messages.back();
   EXPECT_EQ(kept->message.integer("a"), 1);
   EXPECT_EQ(kept->category, 4U);
   EXPECT_EQ(kept->type, 7);
   EXPECT_TRUE(kept->isRedundant);
   EXPECT_TRUE(kept->isSessionStarted);
-  EXPECT_THAT(kept->destinationWorkers, ElementsAre(&TWReportingSessionMetriconWorker::kWorkerClass));
+  EXPECT_THAT(kept->details.destinationWorkers(),
+              ElementsAre(&TWReportingSessionMetriconWorker::kWorkerClass));
 }
 
 TEST_F(KeptMessagesTest, SharesThePayloadsOfAFewMessagesOnly) {

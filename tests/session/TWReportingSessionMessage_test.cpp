@@ -27,7 +27,7 @@ TEST_F(TWReportingSessionMessageTest, ANewMessageIsNotRedundantNotStartedAndHasN
   EXPECT_EQ(record.type, 1);
   EXPECT_FALSE(record.isRedundant);
   EXPECT_FALSE(record.isSessionStarted);
-  EXPECT_THAT(record.destinationWorkers, IsEmpty());
+  EXPECT_THAT(record.details.destinationWorkers(), IsEmpty());
 }
 
 TEST_F(TWReportingSessionMessageTest, ItsPayloadIsItsOwn) {
@@ -41,7 +41,7 @@ TEST_F(TWReportingSessionMessageTest, ACopyIsIndependentAndHasNoDestinations) {
   TWReportingSessionMessage record({{"nested", ValueMap{{"x", 1}}}}, 0x20000004, 7);
   record.isRedundant = true;
   record.isSessionStarted = true;
-  record.destinationWorkers = {&TWReportingSessionMetriconWorker::kWorkerClass};
+  record.details.setDestinationWorkers({&TWReportingSessionMetriconWorker::kWorkerClass});
 
   const auto copy = record.copyWithZone();
   record.message.set("nested", 5);
@@ -51,20 +51,24 @@ TEST_F(TWReportingSessionMessageTest, ACopyIsIndependentAndHasNoDestinations) {
   EXPECT_EQ(copy->type, 7);
   EXPECT_TRUE(copy->isRedundant);
   EXPECT_TRUE(copy->isSessionStarted);
-  EXPECT_THAT(copy->destinationWorkers, IsEmpty());
+  EXPECT_THAT(copy->details.destinationWorkers(), IsEmpty());
   EXPECT_THAT(test.log.textsOf("twrr", LogLevel::kDebug), ElementsAre("copyWithZone"));
 }
 
-TEST_F(TWReportingSessionMessageTest, AListOfWorkerClassesIsCopiedWithItsClasses) {
-  const WorkerClassList none;
-  EXPECT_THAT(none, IsEmpty());
-  EXPECT_EQ(none.begin(), none.end());
-  WorkerClassList list{&TWReportingSessionMetriconWorker::kWorkerClass, nullptr};
-  const WorkerClassList copy = list;
-  list = none;
-  EXPECT_THAT(list, IsEmpty());
-  EXPECT_EQ(copy.size(), 2U);
-  EXPECT_THAT(copy, ElementsAre(&TWReportingSessionMetriconWorker::kWorkerClass, nullptr));
+TEST_F(TWReportingSessionMessageTest, DetailsAreCopiedWithTheirWorkersAndTheirStretch) {
+  const MessageDetails none;
+  EXPECT_TRUE(none.empty());
+  EXPECT_EQ(none.stretch(), std::nullopt);
+  MessageDetails details;
+  details.setDestinationWorkers({&TWReportingSessionMetriconWorker::kWorkerClass, nullptr});
+  details.setStretch({1.0, 2.5});
+  const MessageDetails copy = details;
+  details = none;
+  EXPECT_THAT(details.destinationWorkers(), IsEmpty());
+  EXPECT_EQ(details.stretch(), std::nullopt);
+  EXPECT_THAT(copy.destinationWorkers(),
+              ElementsAre(&TWReportingSessionMetriconWorker::kWorkerClass, nullptr));
+  EXPECT_EQ(copy.stretch(), (TimeStretch{1.0, 2.5}));
 }
 
 TEST_F(TWReportingSessionMessageTest, DescribesItselfByCategoryTypeAndPayload) {

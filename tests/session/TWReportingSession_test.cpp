@@ -672,8 +672,8 @@ TEST_F(WorkerTest, AMessageWithDestinationsReachesOnlyThem) {
   session->start();
   takeEvents();
   const auto record = message({{"a", 1}});
-  record->destinationWorkers = {testWorkerClass("Rtc"),
-                                testWorkerClass("JsonFile")};  // the latter is no consumer
+  record->details.setDestinationWorkers(
+      {testWorkerClass("Rtc"), testWorkerClass("JsonFile")});  // the latter is no consumer
   session->sendMessage(record);
   EXPECT_THAT(takeEvents(), ElementsAre("Rtc got a=1"));
 }

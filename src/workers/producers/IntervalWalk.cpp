@@ -161,6 +161,7 @@ void IntervalWalk::endInterval(const std::optional<Value>& end) {
   }
   summaries_.push_back(
       std::make_shared<TWReportingSessionMessage>(std::move(*summary), kind_.category, kTypeSummary));
+  summaries_.back()->details.setStretch({numberOrZero(begin_), numberOrZero(end)});
   debugLog(site_, "added %@ message { func=%s, action=add, count=%lu }", kind_.subject, kind_.function,
            summaries_.size());
 }

@@ -84,8 +84,8 @@ TWReportingSessionMessages TWReportingSessionGatherMessagesWorker::createGatherM
                   minimumPlaytime);
   TWReportingSessionMessages summaries = walk.summariesOf(messages);
   for (const auto& summary : summaries) {
-    summary->destinationWorkers = {&TWReportingSessionMetriconWorker::kWorkerClass,
-                                   &TWReportingSessionSummaryJsonFileWorker::kWorkerClass};
+    summary->details.setDestinationWorkers({&TWReportingSessionMetriconWorker::kWorkerClass,
+                                            &TWReportingSessionSummaryJsonFileWorker::kWorkerClass});
   }
   return summaries;
 }

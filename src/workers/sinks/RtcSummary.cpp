@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "workers/sinks/RtcSummary.h"
 
-#include <algorithm>
 #include <array>
 #include <charconv>
 #include <concepts>
@@ -100,11 +99,6 @@ class JoinedTexts {
   std::unordered_map<const Shape*, std::vector<std::size_t>> shapes_;
 };
 
-bool isMeantFor(const TWReportingSessionWorkerClass& workerClass, const TWReportingSessionMessage& message) {
-  const auto& classes = message.destinationWorkers;
-  return classes.empty() || std::find(classes.begin(), classes.end(), &workerClass) != classes.end();
-}
-
 }  // namespace
 
 ValueMap rtcSummaryOf(const TWReportingSessionMessages& messages, AudioServiceType serviceType,
@@ -112,7 +106,7 @@ ValueMap rtcSummaryOf(const TWReportingSessionMessages& messages, AudioServiceTy
   JoinedTexts summary;
   summary.add("TW_Session_Summary_Event", Value(serviceType));
   forEachMessage(messages, [&](std::size_t, const TWReportingSessionMessage& message) {
-    if (message.isRedundant || !message.isSessionStarted || !isMeantFor(workerClass, message)) return;
+    if (message.isRedundant || !message.isSessionStarted || !message.details.areMeantFor(workerClass)) return;
     summary.add(message.message);
   });
   return summary.map();

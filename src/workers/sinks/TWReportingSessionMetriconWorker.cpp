@@ -20,7 +20,7 @@ bool TWReportingSessionMetriconWorker::handleMessage(const TWReportingSessionMes
   const auto owner = session.lock();
   const AudioServiceType service = owner == nullptr ? kServiceGeneric : owner->serviceType();
   const auto& names = context.names().eventNames(message.category, message.type, service);
-  metricon.sendEvent(names, [&message] { return message.message; });
+  metricon.sendEvent(names, {}, [&message] { return message.message; });
   return false;
 }
 

@@ -190,7 +190,7 @@ TEST_F(GatherMessagesTest, SummariesAreForTheAnalyticsAndTheJsonFileOnly) {
   const auto summaries =
       summariesOf(stream({{0, {{kRunning, kOn}, {kGather, 1}}}, {12, {{kRunning, kOff}}}}));
   ASSERT_THAT(summaries, SizeIs(1));
-  EXPECT_THAT(summaries[0]->destinationWorkers,
+  EXPECT_THAT(summaries[0]->details.destinationWorkers(),
               ElementsAre(&TWReportingSessionMetriconWorker::kWorkerClass,
                           &TWReportingSessionSummaryJsonFileWorker::kWorkerClass));
 }
@@ -274,7 +274,7 @@ RC_GTEST_FIXTURE_PROP(GatherMessagesTest, SurvivesAnyStream, ()) {
       "play_seconds", [](const TWReportingSessionMessages&) {},
       [](const TWReportingSessionMessage& summary) {
         RC_ASSERT(summary.message.size() == 8U);
-        RC_ASSERT(summary.destinationWorkers.size() == 2U);
+        RC_ASSERT(summary.details.destinationWorkers().size() == 2U);
       });
 }
 

@@ -197,7 +197,7 @@ TEST_F(InputMessagesTest, ASummaryHoldsTheContextOfTheEndingInterval) {
   ASSERT_THAT(summaries, SizeIs(1));
   EXPECT_EQ(summaries[0]->category, 3U);
   EXPECT_EQ(summaries[0]->type, 11);
-  EXPECT_THAT(summaries[0]->destinationWorkers, IsEmpty());
+  EXPECT_THAT(summaries[0]->details.destinationWorkers(), IsEmpty());
   EXPECT_EQ(
       summaries[0]->message.text(),
       R"({"HostApplicationDisplayID":"com.orvane.recorder","inputrunning_seconds":42.0,)"

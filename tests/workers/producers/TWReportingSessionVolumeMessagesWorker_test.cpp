@@ -145,6 +145,14 @@ TEST_F(VolumeMessagesTest, ASummaryHoldsTheContextOfTheEndingInterval) {
       R"("msgidx":1,"msgcnt":1})");
 }
 
+TEST_F(VolumeMessagesTest, ASummaryKnowsItsStretchBesideItsPayload) {
+  const auto summaries = summariesOf(
+      stream({{1, {{kRunning, kOn}, {kVolume, 0.5}}}, {3, {{kVolume, 0.8}}}, {10.5, {{kRunning, kOff}}}}));
+  ASSERT_THAT(summaries, SizeIs(2));
+  EXPECT_EQ(summaries[0]->details.stretch(), (TimeStretch{1.0, 3.0}));
+  EXPECT_EQ(summaries[1]->details.stretch(), (TimeStretch{3.0, 10.5}));
+}
+
 TEST_F(VolumeMessagesTest, UnknownValuesHaveTheirDefaults) {
   const auto summaries = summariesOf(stream({{0, {{kRunning, kOn}, {kVolume, 1}}}, {1, {{kRunning, kOff}}}}));
   ASSERT_THAT(summaries, SizeIs(1));

@@ -50,9 +50,9 @@ TEST(RtcSummaryTest, LeavesOutRedundantEarlyAndOthersMessages) {
   const auto early = started(ValueMap{{"a", 2}});
   early->isSessionStarted = false;
   const auto others = started(ValueMap{{"a", 3}});
-  others->destinationWorkers = {&TWReportingSessionMetriconWorker::kWorkerClass};
+  others->details.setDestinationWorkers({&TWReportingSessionMetriconWorker::kWorkerClass});
   const auto own = started(ValueMap{{"a", 4}});
-  own->destinationWorkers = {&TWReportingSessionRtcWorker::kWorkerClass};
+  own->details.setDestinationWorkers({&TWReportingSessionRtcWorker::kWorkerClass});
   EXPECT_EQ(summaryOf({redundant, early, others, own}).text("a"), "4");
 }
 

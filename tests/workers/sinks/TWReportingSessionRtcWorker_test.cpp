@@ -451,7 +451,7 @@ TEST_F(TWReportingSessionRtcWorkerTest, MessagesForOtherWorkersAreInTheSummaryOn
   static const TWReportingSessionWorkerClass kOther{"Other", false, true, false, false, nullptr};
   startAndRun();
   auto addressed = message({{"a", 1}});
-  addressed->destinationWorkers = {&kOther};
+  addressed->details.setDestinationWorkers({&kOther});
   session->sendMessage(addressed);
   const ValueMap summary = stopAndTakeSummary();
   EXPECT_THAT(service(0).messages, SizeIs(1));

@@ -22,7 +22,8 @@ void StoreMetricon::readConsumersAgain() {
   isStale_ = true;
 }
 
-void StoreMetricon::sendEvent(const EventNames& names, FunctionRef<ValueMap()> payload) {
+void StoreMetricon::sendEvent(const EventNames& names, const EventSubject& /*subject*/,
+                              FunctionRef<ValueMap()> payload) {
   std::optional<EventNames> used = usedOf(names);
   if (used) store_.recordEvent(clock_.now(), std::move(*used), payload());
 }

@@ -37,7 +37,8 @@ class StoreMetricon final : public Metricon {
   // Any thread. The next event reads the preference again.
   void readConsumersAgain();
 
-  void sendEvent(const EventNames& names, FunctionRef<ValueMap()> payload) override;
+  void sendEvent(const EventNames& names, const EventSubject& subject,
+                 FunctionRef<ValueMap()> payload) override;
 
  private:
   static constexpr std::chrono::seconds kReadInterval{1};

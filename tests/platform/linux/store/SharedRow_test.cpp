@@ -430,7 +430,7 @@ TEST_F(SharedRowTest, TheServicesShareTheRowsOfMessagesThatBothTake) {
   session->startConfigurationWithCompletionHandler([](const LinkReportSession::Backends&) {});
   for (int n = 0; n < 5; ++n) {
     ValueMap message{{"hidden", 7.5}, {"n", n}};
-    metricon.sendEvent(n == 4 ? EventNames("nobody.asks") : kNames, [&message] { return message; });
+    metricon.sendEvent(n == 4 ? EventNames("nobody.asks") : kNames, {}, [&message] { return message; });
     std::string problem;
     ASSERT_TRUE(session->sendMessageWithCategory(4, 1, {message, "hidden"}, problem));
   }

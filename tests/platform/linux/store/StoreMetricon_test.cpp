@@ -34,7 +34,7 @@ class StoreMetriconTest : public testing::Test {
   // Whether an event of this name is recorded.
   bool isUsed(const std::string& name) {
     bool asked = false;
-    metricon_.sendEvent(name, [&] {
+    metricon_.sendEvent(name, {}, [&] {
       asked = true;
       return ValueMap();
     });
@@ -129,25 +129,25 @@ TEST_F(StoreMetriconTest, StillAnswersAfterMoreNamesThanItRemembers) {
 
 TEST_F(StoreMetriconTest, RecordsAnEventOnceWhenSeveralConsumersAskForIt) {
   configureConsumers(ValueArray{consumer("a", {"com.orvane.*"}), consumer("b", {"com.orvane.x"})});
-  metricon_.sendEvent("com.orvane.x", [] { return ValueMap{{"n", 1}}; });
+  metricon_.sendEvent("com.orvane.x", {}, [] { return ValueMap{{"n", 1}}; });
   EXPECT_EQ(recorded("com.orvane.x"), 1);
 }
 
 TEST_F(StoreMetriconTest, NeitherMakesNorRecordsAPayloadThatNoConsumerAsksFor) {
   bool asked = false;
-  metricon_.sendEvent("org.example.x", [&] {
+  metricon_.sendEvent("org.example.x", {}, [&] {
     asked = true;
     return ValueMap();
   });
   EXPECT_FALSE(asked);
-  metricon_.sendEvent("com.orvane.x", [] { return ValueMap(); });
+  metricon_.sendEvent("com.orvane.x", {}, [] { return ValueMap(); });
   EXPECT_EQ(recorded("org.example.x"), 0);
   EXPECT_EQ(recorded("com.orvane.x"), 1);
 }
 
 TEST_F(StoreMetriconTest, RecordsTwoNamesOfAnEventWithOnePayload) {
   int made = 0;
-  metricon_.sendEvent({"com.orvane.x", "com.orvane.y"}, [&] { return ValueMap{{"n", ++made}}; });
+  metricon_.sendEvent({"com.orvane.x", "com.orvane.y"}, {}, [&] { return ValueMap{{"n", ++made}}; });
   EXPECT_EQ(made, 1);
   EXPECT_EQ(recorded("com.orvane.x"), 1);
   EXPECT_EQ(recorded("com.orvane.y"), 1);
@@ -156,7 +156,7 @@ TEST_F(StoreMetriconTest, RecordsTwoNamesOfAnEventWithOnePayload) {
 
 TEST_F(StoreMetriconTest, SeesAChangeForNamesThatItRemembers) {
   const EventNames names("com.orvane.x", "org.example.x");
-  const auto send = [&](int n) { metricon_.sendEvent(names, [n] { return ValueMap{{"n", n}}; }); };
+  const auto send = [&](int n) { metricon_.sendEvent(names, {}, [n] { return ValueMap{{"n", n}}; }); };
   send(1);
   configureConsumers(ValueArray{consumer("c", {"org.*"})});
   send(2);
@@ -174,8 +174,8 @@ TEST_F(StoreMetriconTest, SeesAChangeForNamesThatItRemembers) {
 }
 
 TEST_F(StoreMetriconTest, RecordsOnlyTheNameThatAConsumerAsksFor) {
-  metricon_.sendEvent({"org.example.x", "com.orvane.x"}, [] { return ValueMap{{"n", 1}}; });
-  metricon_.sendEvent({"com.orvane.y", "org.example.y"}, [] { return ValueMap{{"n", 2}}; });
+  metricon_.sendEvent({"org.example.x", "com.orvane.x"}, {}, [] { return ValueMap{{"n", 1}}; });
+  metricon_.sendEvent({"com.orvane.y", "org.example.y"}, {}, [] { return ValueMap{{"n", 2}}; });
   EXPECT_EQ(recorded("org.example.x"), 0);
   EXPECT_EQ(recorded("com.orvane.x"), 1);
   EXPECT_EQ(recorded("com.orvane.y"), 1);

@@ -5,12 +5,13 @@
 
 namespace tonewerk {
 
-void MemoryMetricon::sendEvent(const EventNames& names, FunctionRef<ValueMap()> payload) {
+void MemoryMetricon::sendEvent(const EventNames& names, const EventSubject& subject,
+                               FunctionRef<ValueMap()> payload) {
   std::vector<std::string> used = usedOf(names);
   if (used.empty()) return;
   const ValueMap made = payload();
   const MutexLock lock(mutex_);
-  for (std::string& name : used) events_.push_back({std::move(name), made});
+  for (std::string& name : used) events_.push_back({std::move(name), made, subject});
 }
 
 std::vector<std::string> MemoryMetricon::usedOf(const EventNames& names) const {

@@ -19,10 +19,12 @@ class MemoryMetricon final : public Metricon {
   struct Event {
     std::string name;
     ValueMap payload;
+    EventSubject subject;
   };
 
   // Keeps one event for each name that is used.
-  void sendEvent(const EventNames& names, FunctionRef<ValueMap()> payload) override;
+  void sendEvent(const EventNames& names, const EventSubject& subject,
+                 FunctionRef<ValueMap()> payload) override;
 
   // After this only events are used that match one of the glob patterns, or the predicate.
   void useOnly(std::vector<std::string> patterns);
