@@ -29,6 +29,7 @@ class ProcessInformation;
 class Runtrace;
 class SemaphoreFactory;
 class SerialQueueFactory;
+class SessionBook;
 class SystemInformation;
 class TimerService;
 class TracePoints;
@@ -65,6 +66,8 @@ struct Platform {
   DetachedThreads& threads;
   // Where requests are kept until their sessions have been reported; null to keep none.
   Journal* journal = nullptr;
+  // Where the lives of sessions are entered; null for nowhere.
+  SessionBook* sessionBook = nullptr;
   // The directory for reports that people read; absolute.
   std::string logsDirectory = {};
   // The directory for files that are soon moved elsewhere; absolute.

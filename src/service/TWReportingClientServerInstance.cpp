@@ -122,6 +122,7 @@ void TWReportingClientServerInstance::changeServiceType(AudioServiceType service
   (void)replacement->takeOwnBytes();
   (void)replacement->updateConfigurationWithContentsOfConfiguration(&configuration);
   replacement->takePreviousValuesOf(*session);
+  session->endLife(SessionEnding::kReplaced);
   replacement->setServiceType(serviceType);
   setSession(session->reporterID(), replacement);
 }
@@ -315,6 +316,7 @@ void TWReportingClientServerInstance::destroyReportingSession(ReporterID reporte
     if (reporterID == 0) return reply(std::nullopt, true);
     if (const Session session = self.ownSession(reporterID)) {
       if (session->started()) session->stop();
+      session->endLife(SessionEnding::kStopped);
       self.removeSession(reporterID);
     }
     debugLog(category(), "destroying %lli", reporterID);
@@ -431,7 +433,8 @@ void TWReportingClientServerInstance::handleConnectionError() {
     SessionMap& sessions = self->clientReportingSessionMap_;
     for (auto at = last ? sessions.upper_bound(*last) : sessions.begin(); at != sessions.end(); ++at) {
       last = at->first;
-      if (at->second->started()) at->second->stop();
+      if (at->second->started()) at->second->stop(SessionEnding::kDisconnected);
+      at->second->endLife(SessionEnding::kDisconnected);
       if (turns.isTurnOverAfterLongStep()) return Progress::kMore;
     }
     while (!sessions.empty()) {

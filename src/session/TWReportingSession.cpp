@@ -7,6 +7,7 @@
 #include <mutex>
 
 #include "platform/Clock.h"
+#include "platform/JournalPosition.h"
 #include "platform/Log.h"
 #include "session/MessageShapes.h"
 #include "session/TWReportingContext.h"
@@ -48,6 +49,12 @@ std::optional<ReplacedDate> replacedDate(ValueView time) {
 const LogCategory* debugCategory() {
   const LogCategory* category = TWReportingSessionCategory();
   return category->isEnabled(LogLevel::kDebug) ? category : nullptr;
+}
+
+// When the request came for which this thread works. That is also known when the journal is played.
+double timeOfRequest(const Clock& clock) {
+  const double at = JournalPosition::current().at();
+  return at > 0.0 ? at : clock.now();
 }
 
 }  // namespace
@@ -141,10 +148,53 @@ bool TWReportingSession::updateConfigurationWithContentsOfConfiguration(const Va
     update.set(TWReportingApplicationName, *name);
   }
   update.merge(*configuration);
-  const MutexLock lock(propertiesMutex_);
-  if (!mergeWithin(*budget_, configuration_, update)) return false;
-  applicationName_ = TWReportingUtilityRetrieveAppName(configuration_);
+  {
+    const MutexLock lock(propertiesMutex_);
+    if (!mergeWithin(*budget_, configuration_, update)) return false;
+    applicationName_ = TWReportingUtilityRetrieveAppName(configuration_);
+  }
+  if (life_ != nullptr) enterLife();
   return true;
+}
+
+void TWReportingSession::beginLife() {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
+  const Platform& platform = TWReportingContext::current().platform();
+  if (platform.sessionBook == nullptr) return;
+  activeSeconds_ = 0.0;
+  overloads_ = 0;
+  life_ = std::make_shared<SessionLife>(SessionBeginning{.reporterID = reporterID_,
+                                                         .at = timeOfRequest(platform.clock),
+                                                         .request = JournalPosition::current().sequence(),
+                                                         .service = SharedString(serviceName_)});
+  enterLife();
+}
+
+void TWReportingSession::enterLife(const std::optional<SessionEnd>& end) {
+  TWReportingContext::current().platform().sessionBook->enter(life_, knownApplication(),
+                                                              clientProcessName().value_or(""), end);
+}
+
+SharedString TWReportingSession::knownApplication() const {
+  return ValueView(kUnknownName).asText() == applicationName_.view() ? SharedString() : applicationName_;
+}
+
+void TWReportingSession::endLife(SessionEnding ending) {
+  endLife({.ending = ending, .messages = totalMessageCount_, .redundantMessages = redundantMessageCount_});
+}
+
+void TWReportingSession::endLife(SessionEnd end) {
+  assert(TWReportingUtilityIsOnReportingServerQueue());
+  if (life_ == nullptr) return;
+  TWReportingContext& context = TWReportingContext::current();
+  // A session that a recovery ends was open when the daemon went.
+  const RequestJournal& journal = context.journal();
+  if (journal.isRecovering() && !journal.isPlaying()) end.ending = SessionEnding::kInterrupted;
+  end.at = timeOfRequest(context.platform().clock);
+  end.activeSeconds = activeSeconds_;
+  end.overloads = overloads_;
+  enterLife(end);
+  life_.reset();
 }
 
 void TWReportingSession::start() {
@@ -160,6 +210,7 @@ void TWReportingSession::start() {
   started_ = true;
   startedAt_ = TWReportingContext::current().platform().clock.monotonic();
   emitTracePoint(TWReportingTracePoint::kSessionStarted);
+  (void)life();
   startWorkersFromClasses(TWReportingContext::current().workerRegistry().validClasses());
 }
 
@@ -306,8 +357,10 @@ void TWReportingSession::deliver(const TWReportingSessionMessage& message) {
   }
 }
 
-void TWReportingSession::stop() {
+void TWReportingSession::stop(SessionEnding ending) {
   assert(TWReportingUtilityIsOnReportingServerQueue());
+  const SessionEnd end{
+      .ending = ending, .messages = totalMessageCount_, .redundantMessages = redundantMessageCount_};
   store(*lifecycleMessage(kTypeStop,
                           LifecycleTexts::kStop));  // a stop counts even when its message is not stored
   debugLog(TWReportingSessionCategory(), "stop called. reporterID=%lli", reporterID_);
@@ -327,6 +380,7 @@ void TWReportingSession::stop() {
              reporterID_);
   });
   logUnkeptCount();
+  endLife(end);
   forgetMessages();
   totalMessageCount_ = 0;
   redundantMessageCount_ = 0;

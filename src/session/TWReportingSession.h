@@ -10,6 +10,7 @@
 #include <utility>
 #include <vector>
 
+#include "platform/SessionBook.h"
 #include "protocol/AudioEvent.h"
 #include "protocol/RequestSet.h"
 #include "session/KeptBytesBudget.h"
@@ -71,9 +72,22 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   // has no room.
   [[nodiscard]] bool updateConfigurationWithContentsOfConfiguration(const ValueMap* configuration);
 
+  // The session's life as reports refer to it. It begins with the start, or with the first message before it,
+  // and ends with a stop. None when no book of lives is kept.
+  const std::shared_ptr<SessionLife>& life() {
+    if (life_ == nullptr) beginLife();
+    return life_;
+  }
+  // Ends the life of a session that may not be started, and will not be used again. Does nothing when it has
+  // ended.
+  void endLife(SessionEnding ending);
+  // What its life adds up.
+  void countActivity(double seconds) { activeSeconds_ += seconds; }
+  void countOverload() { ++overloads_; }
+
   void start();
   void startWorkersFromClasses(const std::vector<const TWReportingSessionWorkerClass*>& classes);
-  void stop();
+  void stop(SessionEnding ending = SessionEnding::kStopped);
 
   // Ask the processor for the memory that sendMessage() uses: for the session itself, and, when that is
   // there, for what it refers to. The second one reads where that is without the lock, because only the work
@@ -197,6 +211,12 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   // The workers whose class has `role`.
   Workers workersWith(bool TWReportingSessionWorkerClass::*role) const;
   void deliver(const TWReportingSessionMessage& message);
+  void beginLife();
+  void endLife(SessionEnd end);
+  // Empty when it is not known.
+  SharedString knownApplication() const;
+  // Enters the life in the book.
+  void enterLife(const std::optional<SessionEnd>& end = std::nullopt);
   // The bytes that the session has taken from the budget.
   std::size_t keptBytes() const;
   // Returns the stored message; null when the budget has no room for it. `sender` is null for messages that
@@ -223,6 +243,9 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   std::uint64_t totalMessageCount_ = 0;
   std::uint64_t redundantMessageCount_ = 0;
   std::optional<std::chrono::nanoseconds> startedAt_;
+  std::shared_ptr<SessionLife> life_;
+  double activeSeconds_ = 0.0;  // of this life
+  std::uint64_t overloads_ = 0;
 
   KeptMessages messages_;
   NewestMessages newest_;

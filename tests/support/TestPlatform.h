@@ -30,6 +30,7 @@
 #include "support/memory/reports/MemoryLinkReport.h"
 #include "support/memory/reports/MemoryMetricon.h"
 #include "support/memory/reports/MemoryRuntrace.h"
+#include "support/memory/reports/MemorySessionBook.h"
 #include "support/memory/reports/MemoryWhirlcapRequest.h"
 
 namespace tonewerk {
@@ -96,6 +97,7 @@ struct TestPlatform {
             .commands = commands,
             .threads = threads,
             .journal = journal,
+            .sessionBook = &sessionBook,
             .logsDirectory = "/logs",
             .temporaryDirectory = "/tmp"};
   }
@@ -127,6 +129,7 @@ struct TestPlatform {
   MemoryChanmeter chanmeter;
   MemoryCommandRunner commands;
   MemoryDetachedThreads threads;
+  MemorySessionBook sessionBook;
   Journal* journal = nullptr;
 };
 

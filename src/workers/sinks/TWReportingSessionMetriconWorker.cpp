@@ -20,7 +20,12 @@ bool TWReportingSessionMetriconWorker::handleMessage(const TWReportingSessionMes
   const auto owner = session.lock();
   const AudioServiceType service = owner == nullptr ? kServiceGeneric : owner->serviceType();
   const auto& names = context.names().eventNames(message.category, message.type, service);
-  metricon.sendEvent(names, {}, [&message] { return message.message; });
+  const EventSubject subject{.category = message.category,
+                             .type = message.type,
+                             .source = message.isDerived ? EventSource::kDerived : EventSource::kClient,
+                             .life = owner == nullptr ? nullptr : owner->life(),
+                             .stretch = message.details.stretch()};
+  metricon.sendEvent(names, subject, [&message] { return message.message; });
   return false;
 }
 

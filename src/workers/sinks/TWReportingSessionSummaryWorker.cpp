@@ -75,10 +75,13 @@ bool TWReportingSessionSummaryWorker::handleMessage(const TWReportingSessionMess
   if (const ValueView duration = knownValue(message.message, KnownKey::kSessionDuration)) {
     totalActiveTime_ += duration.number();
     ++activeCount_;
+    if (const auto owner = session.lock()) owner->countActivity(duration.number());
     return false;
   }
   const ValueView issueType = knownValue(message.message, KnownKey::kIssueType);
-  if (issueType && issueType == ValueView(kOverload)) ++overloadCount_;
+  if (!issueType || !(issueType == ValueView(kOverload))) return false;
+  ++overloadCount_;
+  if (const auto owner = session.lock()) owner->countOverload();
   return false;
 }
 

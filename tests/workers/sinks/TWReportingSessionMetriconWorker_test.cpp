@@ -60,6 +60,25 @@ TEST_F(TWReportingSessionMetriconWorkerTest, PassesThePayloadAsItIs) {
   for (const auto& event : test.metricon.events()) EXPECT_EQ(event.payload, payload);
 }
 
+TEST_F(TWReportingSessionMetriconWorkerTest, SaysWhatTheEventIsAbout) {
+  TWReportingSessionMessage message({{"a", 1}}, kCategoryVolume, kTypeSummary);
+  message.isDerived = true;
+  message.details.setStretch({1.0, 3.5});
+  worker.handleMessage(message);
+  handle(4, 2);
+  ASSERT_THAT(test.metricon.events(), SizeIs(4));
+  const EventSubject derived = test.metricon.events()[0].subject;
+  EXPECT_EQ(derived.category, kCategoryVolume);
+  EXPECT_EQ(derived.type, kTypeSummary);
+  EXPECT_EQ(derived.source, EventSource::kDerived);
+  EXPECT_EQ(derived.life, session->life());
+  EXPECT_EQ(derived.stretch, (TimeStretch{1.0, 3.5}));
+  const EventSubject sent = test.metricon.events()[2].subject;
+  EXPECT_EQ(sent.source, EventSource::kClient);
+  EXPECT_EQ(sent.life, session->life());
+  EXPECT_EQ(sent.stretch, std::nullopt);
+}
+
 TEST_F(TWReportingSessionMetriconWorkerTest, WhenNeitherNameIsInUseNothingIsSentAndTheAnswerIsStillFalse) {
   test.metricon.useOnly(std::vector<std::string>{});
   EXPECT_FALSE(handle(4, 2));
