@@ -1,0 +1,338 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/store/StoreViews.h"
+
+#include "platform/linux/store/SqliteDatabase.h"
+
+namespace tonewerk {
+namespace {
+
+// A message of the daemon, or one of a file of an earlier version, which does not know who made it.
+std::string derived(std::string_view category, std::string_view type) {
+  std::string sql = "r.name_set IN (SELECT name_set FROM analytics_name WHERE category = '";
+  sql.append(category).append("' AND type = '").append(type);
+  return sql.append("' AND source IS NOT 'client')");
+}
+
+// The rate at the beginning of a text like "48000 Hz, 2 ch, Float32".
+constexpr std::string_view kSampleRate =
+    "CASE WHEN r.payload ->> 'session_selected_format' GLOB '[0-9]* Hz*'"
+    " AND r.payload ->> 'session_selected_format' NOT GLOB '* * Hz*'"
+    " THEN CAST(r.payload ->> 'session_selected_format' AS INTEGER) END";
+
+std::string stretchesOf(std::string_view category, std::string_view columns) {
+  std::string sql = "SELECT r.id, r.session, nullif(s.service, 'unknown'), ";
+  sql.append(category == "Gather" ? "s.application"
+                                  : "nullif(r.payload ->> 'HostApplicationDisplayID', 'Unknown')");
+  sql.append(", r.began_at, r.ended_at, ").append(columns);
+  sql.append(" FROM analytics_row AS r LEFT JOIN session_row AS s ON s.id = r.session WHERE ");
+  return sql.append(derived(category, "Summary"));
+}
+
+std::string volumeStretches() {
+  std::string columns =
+      "round(r.payload ->> 'play_seconds', 3), nullif(r.payload ->> 'active_devices', 'unknown'),"
+      " CAST(r.payload ->> 'QMSessionVolume' AS REAL),"
+      " CAST(nullif(r.payload ->> 'QMSessionVolumeBucketed', '') AS REAL), ";
+  columns.append(kSampleRate);
+  return stretchesOf("Volume", columns +
+                                   ", nullif(r.payload ->> 'mChannelsPerFrame', -1),"
+                                   " nullif(r.payload ->> 'mFormatID', 'unknown'),"
+                                   " r.payload ->> 'ringerstate', r.payload ->> 'spatializationEnabled'");
+}
+
+std::string inputStretches() {
+  return stretchesOf(
+      "Input",
+      "round(r.payload ->> 'inputrunning_seconds', 3), nullif(r.payload ->> 'active_devices', 'unknown'),"
+      " nullif(r.payload ->> 'vp_config_operation_mode', 'unknown'),"
+      " nullif(r.payload ->> 'vp_config_input_port', 'unknown'), r.payload ->> 'vocoders'");
+}
+
+std::string gatherStretches() {
+  std::string columns =
+      "round(r.payload ->> 'play_seconds', 3), nullif(r.payload ->> 'active_devices', 'unknown'), ";
+  columns.append(kSampleRate);
+  return stretchesOf("Gather", columns +
+                                   ", nullif(r.payload ->> 'mChannelsPerFrame', -1),"
+                                   " nullif(r.payload ->> 'mFormatID', 'unknown')");
+}
+
+// The entries of what the driver statistics of one form sent, with the parts of their keys:
+// "AmpDrv_Speaker_Simple_RailVolts". Driver, group and subgroup may each be missing. Where a part is alone,
+// or two are there, those groups and subgroups are recognised that the daemon subscribes to.
+std::string channels(std::string_view form) {
+  constexpr std::string_view kGroups =
+      "('OrvaneAE2MCA', 'Speaker', 'Haptics', 'StateTransitionTimesms', 'Rx', 'Tx', 'pdm')";
+  constexpr std::string_view kSubgroups = "('MCA', 'Stats', 'Pellan2')";
+  std::string mark = "_";
+  mark.append(form).append("_");
+  std::string sql = "(SELECT session, at, value, name,";
+  // Three parts are all of them.
+  sql.append(" CASE WHEN third <> '' THEN first WHEN first IN ").append(kGroups);
+  sql.append(" THEN NULL WHEN second <> '' THEN first WHEN first IN ").append(kSubgroups);
+  sql.append(" THEN NULL ELSE nullif(first, '') END AS driver,");
+  sql.append(" CASE WHEN third <> '' THEN second WHEN first IN ").append(kGroups);
+  sql.append(" THEN first WHEN second IN ").append(kSubgroups);
+  sql.append(" THEN NULL ELSE nullif(second, '') END AS group_name,");
+  sql.append(" CASE WHEN third <> '' THEN third WHEN first IN ").append(kGroups);
+  sql.append(" THEN nullif(second, '') WHEN second IN ").append(kSubgroups);
+  sql.append(" THEN second WHEN second = '' AND first IN ").append(kSubgroups);
+  sql.append(" THEN first END AS subgroup FROM (SELECT session, at, value, name, first,");
+  sql.append(" substr(rest, 1, instr(rest || '_', '_') - 1) AS second,");
+  sql.append(" substr(rest, instr(rest || '_', '_') + 1) AS third FROM (SELECT session, at, value, name,");
+  sql.append(" substr(head, 1, instr(head || '_', '_') - 1) AS first,");
+  sql.append(" substr(head, instr(head || '_', '_') + 1) AS rest FROM (");
+  sql.append("SELECT r.session AS session, r.recorded_at AS at, j.value AS value,");
+  sql.append(" substr('_' || j.key, 2, instr('_' || j.key, '").append(mark).append("') - 2) AS head,");
+  sql.append(" nullif(substr('_' || j.key, instr('_' || j.key, '").append(mark).append("') + ");
+  sql.append(std::to_string(mark.size())).append("), '') AS name");
+  sql.append(" FROM analytics_row AS r CROSS JOIN json_each(r.payload) AS j WHERE ");
+  sql.append(derived("Chanmetering", form));
+  sql.append(" AND instr('_' || j.key, '").append(mark).append("') > 0))))");
+  return sql;
+}
+
+// "count=4,lower=0,upper=30,min=3,max=25,unit=us::0-10:5;20-30:7" becomes a row for each bucket. A bound may
+// be below 0.
+std::string channelBuckets() {
+  return "SELECT session, at, driver, group_name, subgroup, name, unit,"
+         " CAST(substr(bounds, 1, dash - 1) AS INTEGER), CAST(substr(bounds, dash + 1) AS INTEGER), hits "
+         "FROM ("
+         "SELECT session, at, driver, group_name, subgroup, name, unit, bounds, hits,"
+         " instr(substr(bounds, 2), '-') + 1 AS dash FROM ("
+         "SELECT c.session AS session, c.at AS at, c.driver AS driver, c.group_name AS group_name,"
+         " c.subgroup AS subgroup, c.name AS name,"
+         " nullif(substr(c.value, instr(c.value, 'unit=') + 5,"
+         " instr(c.value, '::') - instr(c.value, 'unit=') - 5), '') AS unit,"
+         " substr(b.value, 1, instr(b.value, ':') - 1) AS bounds,"
+         " CAST(substr(b.value, instr(b.value, ':') + 1) AS INTEGER) AS hits FROM " +
+         channels("Histogram") +
+         " AS c CROSS JOIN json_each('[' || replace(json_quote(substr(c.value, instr(c.value, '::') + 2)),"
+         " ';', '\",\"') || ']') AS b))";
+}
+
+// "name:ON,transition:3,residency:200,duty_cycle:0.250000;name:OFF,..." becomes a row for each state.
+std::string channelStates() {
+  return "SELECT session, at, driver, group_name, subgroup, name,"
+         " substr(state, 1, instr(state, ',transition:') - 1),"
+         " CAST(substr(state, instr(state, ',transition:') + 12) AS INTEGER),"
+         " CAST(substr(state, instr(state, ',residency:') + 11) AS INTEGER),"
+         " CAST(substr(state, instr(state, ',duty_cycle:') + 12) AS REAL) FROM ("
+         "SELECT c.session AS session, c.at AS at, c.driver AS driver, c.group_name AS group_name,"
+         " c.subgroup AS subgroup, c.name AS name, b.value AS state FROM " +
+         channels("State") +
+         " AS c CROSS JOIN json_each('[' || replace(json_quote(substr(c.value, 6)), ';name:', '\",\"') || "
+         "']')"
+         " AS b WHERE c.value <> '')";
+}
+
+constexpr StoreViewColumn kSession{"session", "integer", "the `session`"};
+constexpr StoreViewColumn kService{"service", "text", "what the session reports for, as \"telephony\""};
+constexpr StoreViewColumn kApplication{"application", "text", "the client application's identifier"};
+constexpr StoreViewColumn kStretchBegin{"started_at", "real", "when the stretch began"};
+constexpr StoreViewColumn kStretchEnd{"ended_at", "real", "when it ended"};
+constexpr StoreViewColumn kDevice{"device", "text", "the devices that were active"};
+constexpr StoreViewColumn kSampleRateColumn{"sample_rate", "integer",
+                                            "in Hz, where the selected format begins with it"};
+constexpr StoreViewColumn kChannels{"channels", "integer", "in a frame"};
+constexpr StoreViewColumn kFormat{"format", "text", "the format's identifier, as \"lpcm\""};
+constexpr StoreViewColumn kDriver{"driver", "text", "the driver's name"};
+constexpr StoreViewColumn kGroup{"group_name", "text", "the channel's group"};
+constexpr StoreViewColumn kSubgroup{"subgroup", "text", "and its subgroup"};
+constexpr StoreViewColumn kChannelName{"name", "text", "the channel"};
+constexpr StoreViewColumn kCountedAt{"at", "real", "when the session ended"};
+
+std::vector<StoreView> makeViews() {
+  return {
+      {"session",
+       "a session's life, from its start to its stop",
+       {{"id", "integer", "its number in this store"},
+        {"reporter_id", "integer", "the identifier that its client knows it by"},
+        kService,
+        kApplication,
+        {"process", "text", "the client's process name"},
+        {"user_id", "integer", "the user of the client"},
+        {"started_at", "real", "when it began"},
+        {"ended_at", "real", "when it ended; null while it runs"},
+        {"ending", "text",
+         "\"stopped\", \"replaced\" (by a session for another service), \"disconnected\" (its client had "
+         "gone) or \"interrupted\" (the daemon had gone); null while it runs"},
+        {"messages", "integer", "received, without the summaries made at its end; null while it runs"},
+        {"unique_messages", "integer", "those that repeated none; null while it runs"},
+        {"redundant_messages", "integer", "those that repeated another one; null while it runs"},
+        {"active_seconds", "real", "the sum of the durations that it reported; null while it runs"},
+        {"overloads", "integer", "the number of overloads that it reported; null while it runs"}},
+       "SELECT id, reporter_id, nullif(service, 'unknown'), application, process, user_id, started_at, "
+       "ended_at, ending, messages,"
+       " messages - redundant_messages, redundant_messages, active_seconds, overloads FROM session_row"},
+      {"event",
+       "a message, once, whatever the number of its names",
+       {{"id", "integer", "grows in the order of recording"},
+        {"at", "real", "when it was recorded"},
+        kSession,
+        {"category", "text", "its category"},
+        {"type", "text", "its type"},
+        {"source", "text", "\"client\" or \"derived\" (the daemon has made it)"},
+        {"payload", "text", "the message, as JSON"}},
+       "SELECT r.id, r.recorded_at, r.session, n.category, n.type, n.source, r.payload"
+       " FROM analytics_row AS r CROSS JOIN analytics_name AS n ON n.name_set = r.name_set AND n.position = 0"
+       " WHERE n.category IS NOT NULL"},
+      {"volume_stretch",
+       "a stretch of playback at one volume, on the same devices, in the same format",
+       {{"id", "integer", "the `event`"},
+        kSession,
+        kService,
+        kApplication,
+        kStretchBegin,
+        kStretchEnd,
+        {"seconds", "real", "how long it played"},
+        kDevice,
+        {"volume", "real", "0 to 1"},
+        {"volume_bucket", "real", "the nearest of 17 volumes, 0 to 1 in steps of 0.0625"},
+        kSampleRateColumn,
+        kChannels,
+        kFormat,
+        {"ringer", "integer", "1 when the ringer was on"},
+        {"spatial", "integer", "1 when it was spatialised"}},
+       volumeStretches()},
+      {"input_stretch",
+       "a stretch of recording on the same devices",
+       {{"id", "integer", "the `event`"},
+        kSession,
+        kService,
+        kApplication,
+        kStretchBegin,
+        kStretchEnd,
+        {"seconds", "real", "how long input ran"},
+        kDevice,
+        {"mode", "text", "the operation mode of voice processing"},
+        {"input_port", "text", "its input port"},
+        {"vocoders", "text", "the vocoders that were switched to, with their rates, as \"A:16000,B:8000\""}},
+       inputStretches()},
+      {"gather_stretch",
+       "a stretch of playback in a shared group session",
+       {{"id", "integer", "the `event`"},
+        kSession,
+        kService,
+        kApplication,
+        kStretchBegin,
+        kStretchEnd,
+        {"seconds", "real", "how long it played"},
+        kDevice,
+        kSampleRateColumn,
+        kChannels,
+        kFormat},
+       gatherStretches()},
+      {"issue",
+       "an overload or another issue",
+       {{"id", "integer", "the `event`"},
+        {"at", "real", "when it was recorded"},
+        kSession,
+        kService,
+        kApplication,
+        {"kind", "text", "\"overload\", or what its client calls it"},
+        {"node", "text", "where in the audio graph"},
+        {"duration_seconds", "real", "for how long a channel was silent"},
+        {"buffer_frames", "integer", "the smallest buffer, in frames"},
+        {"io_cycle", "integer", "the cycle's number"}},
+       "SELECT r.id, r.recorded_at, r.session, nullif(s.service, 'unknown'),"
+       " nullif(r.payload ->> 'HostApplicationDisplayID', 'Unknown'), CAST(r.payload ->> 'issue_type' AS "
+       "TEXT),"
+       " r.payload ->> 'node', CAST(r.payload ->> 'any_channel_silence_seconds' AS REAL),"
+       " r.payload ->> 'smallest_buffer_frame_size', r.payload ->> 'io_cycle'"
+       " FROM analytics_row AS r LEFT JOIN session_row AS s ON s.id = r.session"
+       " WHERE instr(r.payload, '\"issue_type\":') > 0 AND r.payload ->> 'issue_type' IS NOT NULL"},
+      {"haptics",
+       "a power event of the haptics engine",
+       {{"id", "integer", "grows in the order of recording"},
+        {"at", "real", "when it was recorded"},
+        kApplication,
+        {"name", "text", "the power event"},
+        {"seconds", "real", "for how long the engine was on, in the unit of the application that reports it"},
+        {"status", "integer", "1 when the engine came on, 0 when it went off"}},
+       "SELECT id, recorded_at, nullif(payload ->> 'ApplicationName', 'Unknown'), name,"
+       " CAST(coalesce(payload ->> 'EngineOnDuration', payload ->> 'Haptic_Active_Hardware_Time_Seconds')"
+       " AS REAL), payload ->> 'Status' FROM power_event WHERE event_group = 28"},
+      {"channel_value",
+       "what a driver's counter counted in a session",
+       {kSession,
+        kCountedAt,
+        kDriver,
+        kGroup,
+        kSubgroup,
+        kChannelName,
+        {"unit", "text", "null: simple counters report none"},
+        {"value", "integer", "by how much it grew"}},
+       "SELECT session, at, driver, group_name, subgroup, name, CAST(NULL AS TEXT), value FROM " +
+           channels("Simple")},
+      {"channel_bucket",
+       "a bucket of a driver's histogram that had hits in a session",
+       {kSession,
+        kCountedAt,
+        kDriver,
+        kGroup,
+        kSubgroup,
+        kChannelName,
+        {"unit", "text", "of the bounds"},
+        {"lower", "integer", "the lower bound"},
+        {"upper", "integer", "the upper bound"},
+        {"hits", "integer", "in this session"}},
+       channelBuckets()},
+      {"channel_state",
+       "a state in which a driver was in a session",
+       {kSession,
+        kCountedAt,
+        kDriver,
+        kGroup,
+        kSubgroup,
+        kChannelName,
+        {"state", "text", "its name"},
+        {"transitions", "integer", "into the state"},
+        {"residency", "integer", "how long it was in the state, in the driver's unit"},
+        {"duty_cycle", "real", "the part of the time, 0 to 1"}},
+       channelStates()},
+  };
+}
+
+std::string creationOf(const StoreView& view) {
+  std::string sql = "CREATE VIEW ";
+  sql.append(view.name).append(" (");
+  for (const StoreViewColumn& column : view.columns) {
+    sql.append(&column == view.columns.data() ? "" : ", ").append(column.name);
+  }
+  return sql.append(") AS ").append(view.select);
+}
+
+}  // namespace
+
+const std::vector<StoreView>& storeViews() {
+  static const std::vector<StoreView> views = makeViews();
+  return views;
+}
+
+std::string storeViewsSql() {
+  std::string sql;
+  for (const StoreView& view : storeViews()) sql.append(creationOf(view)).append(";");
+  return sql;
+}
+
+bool ensureStoreViews(SqliteDatabase& database) {
+  std::string missing;
+  SqliteStatement find =
+      database.prepare("SELECT sql = ?2 FROM sqlite_master WHERE type = 'view' AND name = ?1");
+  for (const StoreView& view : storeViews()) {
+    const std::string creation = creationOf(view);
+    find.bind(1, view.name);
+    find.bind(2, creation);
+    const SqliteStatement::Step step = find.step();
+    if (step == SqliteStatement::Step::kFailed) return false;
+    const bool isThere = step == SqliteStatement::Step::kRow && find.integer(0) == 1;
+    find.reset();
+    if (isThere) continue;
+    missing.append("DROP VIEW IF EXISTS ").append(view.name).append(";").append(creation).append(";");
+  }
+  find = {};
+  return missing.empty() || database.run("BEGIN IMMEDIATE;" + missing + "COMMIT;");
+}
+
+}  // namespace tonewerk
