@@ -49,6 +49,7 @@
 #include "platform/linux/store/StoreDiagwire.h"
 #include "platform/linux/store/StoreEnergybook.h"
 #include "platform/linux/store/StoreMetricon.h"
+#include "platform/linux/store/StoreSessionBook.h"
 #include "platform/linux/system/Heartbeats.h"
 #include "platform/linux/system/ServiceManager.h"
 #include "platform/linux/system/WatchdogFeeder.h"
@@ -339,6 +340,7 @@ class Daemon {
   Platform platformOf(LinuxPlatform& linux, const Directories& directories) {
     Platform platform =
         linux.platform(clock_, metricon_, energybook_, diagwire_, linkReport_, tracing_, journal_);
+    platform.sessionBook = &sessionBook_;
     platform.logsDirectory = directories.logs;
     return platform;
   }
@@ -392,6 +394,7 @@ class Daemon {
   WakingClock storeClock_;
   ReportStore store_;
   StoreMetricon metricon_;
+  StoreSessionBook sessionBook_{store_};
   StoreEnergybook energybook_;
   StoreDiagwire diagwire_;
   LinuxLinkReport linkReport_;

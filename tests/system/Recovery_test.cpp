@@ -132,6 +132,28 @@ TEST_F(RecoveryTest, ASessionThatHasStoppedIsNotReportedAgain) {
   EXPECT_THAT(recorded(kSummaries), SizeIs(4));
 }
 
+TEST_F(RecoveryTest, ASessionHasOneLifeAndItsEndingHoweverOftenTheDaemonCrashes) {
+  const auto lives = [this] {
+    SqliteDatabase store;
+    EXPECT_TRUE(store.open(daemon.storePath(), SqliteDatabase::Mode::kReadOnly, std::chrono::seconds(30)));
+    return rowsOf(
+        store,
+        "SELECT reporter_id, ending, messages, application, (SELECT count(*) FROM volume_stretch AS v"
+        " WHERE v.session = s.id AND v.started_at > 0) FROM session AS s ORDER BY id",
+        5);
+  };
+  DaemonClient client = connect();
+  play(client);
+  client.stop(kSession);
+  play(client, kSession + 1);
+  const std::string stopped = std::to_string(kSession) + " stopped 3 com.example.player 2";
+  const std::string interrupted = std::to_string(kSession + 1) + " interrupted 3 com.example.player 2";
+  crash();
+  EXPECT_THAT(lives(), ElementsAre(stopped, interrupted));
+  crash();
+  EXPECT_THAT(lives(), ElementsAre(stopped, interrupted));
+}
+
 TEST_F(RecoveryTest, NothingIsRecoveredAfterAnEndInOrder) {
   {
     DaemonClient client = connect();

@@ -23,8 +23,8 @@ class AnalyticsTable final : private SqliteRows {
   // `database` outlives it. Prepares its statement. Whether that succeeded shows in the first insert().
   explicit AnalyticsTable(SqliteDatabase& database);
 
-  // Inserts the batch's analytics rows under their identifiers. The sessions of those that are messages, too,
-  // are in the file. False on failure. The database then has the problem.
+  // Inserts the batch's analytics rows under their identifiers. The lives of their sessions, and the sessions
+  // of those that are messages, too, are in the file. False on failure. The database then has the problem.
   [[nodiscard]] bool insert(const StoreBatch& batch, const StoreNumbering& numbering);
 
  private:
@@ -33,17 +33,17 @@ class AnalyticsTable final : private SqliteRows {
 
   std::size_t rowCount() const override;
   void read(std::size_t row, int column, SqliteCell& cell) const override;
-  [[nodiscard]] std::optional<std::int64_t> nameSet(const EventNames& names);
-  [[nodiscard]] std::optional<std::int64_t> findNameSet(const EventNames& names, bool& failed);
-  [[nodiscard]] std::optional<std::int64_t> insertNameSet(const EventNames& names);
+  [[nodiscard]] std::optional<std::int64_t> nameSet(const EventKind& kind);
+  [[nodiscard]] std::optional<std::int64_t> findNameSet(const EventKind& kind, bool& failed);
+  [[nodiscard]] std::optional<std::int64_t> insertNameSet(const EventKind& kind);
 
   SqliteDatabase& database_;
   SqliteStatement insertRows_;
   SqliteStatement insertNextRows_;             // those with the next identifiers
   const StoreBatch* batch_ = nullptr;          // while its rows are inserted
   std::span<const std::int64_t> identifiers_;  // of its rows
-  std::vector<std::int64_t> batchSets_;        // the name sets of batch_->names()
-  std::unordered_map<EventNames, std::int64_t, EventNamesHash> known_;
+  std::vector<std::int64_t> batchSets_;        // the name sets of batch_->kinds()
+  std::unordered_map<EventKind, std::int64_t, EventKindHash> known_;
 };
 
 }  // namespace tonewerk

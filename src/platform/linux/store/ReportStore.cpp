@@ -57,8 +57,8 @@ ReportStore::~ReportStore() {
   if (lost > 0) errorLog(log_, "rows lost that could not be written to %s: %llu", database_.path(), lost);
 }
 
-void ReportStore::recordEvent(double recordedAt, EventNames names, ValueMap payload) {
-  add(AnalyticsRow{recordedAt, std::move(names), std::move(payload)});
+void ReportStore::recordEvent(double recordedAt, EventNames names, ValueMap payload, EventSubject subject) {
+  add(AnalyticsRow{recordedAt, std::move(names), std::move(payload), std::move(subject)});
 }
 
 void ReportStore::record(const MetricRow& row) { add(row); }
@@ -69,6 +69,8 @@ void ReportStore::record(const PowerRow& row) { add(row); }
 void ReportStore::record(const RtcSessionRow& row) { add(row, {}); }
 
 void ReportStore::record(const RtcMessageRow& row) { add(row, {}); }
+
+void ReportStore::record(const LifeRow& row) { addToQueue(row, {}); }
 
 template <typename Row>
 void ReportStore::add(const Row& row, JournalPosition::Row position) {

@@ -66,12 +66,14 @@ class ReportStore {
   ~ReportStore();
 
   // Any thread. `recordedAt` in seconds since 1970.
-  void recordEvent(double recordedAt, EventNames names, ValueMap payload);
+  void recordEvent(double recordedAt, EventNames names, ValueMap payload, EventSubject subject = {});
   // Any thread. A row of another table.
   void record(const MetricRow& row);
   void record(const PowerRow& row);
   void record(const RtcSessionRow& row);
   void record(const RtcMessageRow& row);
+  // Also while the journal is played: a life that the file has already is known again.
+  void record(const LifeRow& row);
 
   // Before anything is recorded: the marks in the file. Waits for the store's thread to open the file.
   // What fails is tried again for a fifth of a second. None on failure, which is logged.

@@ -5,6 +5,7 @@
 
 #include "platform/linux/store/StoreSchema.h"
 #include "values/CompactJson.h"
+#include "values/ShortenedText.h"
 
 namespace tonewerk {
 
@@ -39,6 +40,12 @@ StoreRowText::StoreRowText(const RtcMessageRow& row) : text_(emptyText()) {
   appendCompactJson(text_, row.payload, row.hidden);
 }
 
+// The names as they are stored.
+StoreRowText::StoreRowText(const LifeRow& row) : text_(emptyText()) {
+  text_ += shortened(row.application.view(), StoreBatch::kMaxNameBytes);
+  text_ += shortened(row.process.view(), StoreBatch::kMaxNameBytes);
+}
+
 StoreRowText::~StoreRowText() {
   if (text_.capacity() > kKeptBytes) std::string().swap(text_);  // an assignment may keep the buffer
 }
@@ -63,8 +70,23 @@ std::size_t StoreBatch::bytesOf(const RtcMessageRow& /*row*/, const StoreRowText
   return sizeof(RtcMessage) + text.view().size();
 }
 
+std::size_t StoreBatch::bytesOf(const LifeRow& /*row*/, const StoreRowText& text) {
+  return sizeof(Session) + sizeof(SessionLife) + text.view().size();
+}
+
 void StoreBatch::add(const AnalyticsRow& row, const StoreRowText& text, const StoreRowOwner& owner) {
-  analytics_.push_back({row.recordedAt, indexOf(row.names), owner.user, append(text.view()), {}});
+  Analytics& event = analytics_.emplace_back();
+  event.recordedAt = row.recordedAt;
+  event.kind = indexOf({row.names, row.subject});
+  event.user = owner.user;
+  event.payload = append(text.view());
+  if (row.subject.life != nullptr) {
+    event.life = static_cast<std::uint32_t>(lives_.indexOf(row.subject.life, owner.user));
+  }
+  if (row.subject.stretch) {
+    event.stretch = static_cast<std::uint32_t>(stretches_.size());
+    stretches_.push_back(*row.subject.stretch);
+  }
   shareable_ = text.view().size() <= kMaxSharedTextBytes ? row.payload : ValueMap();
   count(bytesOf(row, text), owner);
 }
@@ -83,13 +105,24 @@ void StoreBatch::add(const PowerRow& row, const StoreRowText& text, const StoreR
 }
 
 void StoreBatch::add(const RtcSessionRow& row, const StoreRowText& text, const StoreRowOwner& owner) {
-  indexOf(row.session, owner.user);
+  sessions_.indexOf(row.session, owner.user);
   count(bytesOf(row, text), owner);
 }
 
 void StoreBatch::add(const RtcMessageRow& row, const StoreRowText& text, const StoreRowOwner& owner) {
-  rtcMessages_.push_back({row.sentAt, indexOf(row.session, owner.user), row.category, row.type, owner.user,
-                          append(text.view()), analytics_.size()});
+  rtcMessages_.push_back({row.sentAt, sessions_.indexOf(row.session, owner.user), row.category, row.type,
+                          owner.user, append(text.view()), analytics_.size()});
+  shareable_ = {};
+  count(bytesOf(row, text), owner);
+}
+
+void StoreBatch::add(const LifeRow& row, const StoreRowText& text, const StoreRowOwner& owner) {
+  const std::size_t application = shortened(row.application.view(), kMaxNameBytes).size();
+  const Part both = append(text.view());
+  lifeRows_.push_back({static_cast<std::uint32_t>(lives_.indexOf(row.life, owner.user)),
+                       {both.begin, application},
+                       {both.begin + application, both.size - application},
+                       row.end});
   shareable_ = {};
   count(bytesOf(row, text), owner);
 }
@@ -104,7 +137,7 @@ bool StoreBatch::share(const RtcMessageRow& row, std::uint32_t user) {
   std::optional<JsonCut> cut(std::in_place);
   if (!row.hidden.empty()) cut = cutOfEntry(text(event.payload), row.payload, row.hidden);
   if (!cut || cut->size > kMaxHiddenBytes) return false;
-  event.rtc = Shared{indexOf(row.session, user), row.category, row.type, *cut};
+  event.rtc = Shared{sessions_.indexOf(row.session, user), row.category, row.type, *cut};
   shareable_ = {};
   return true;
 }
@@ -114,10 +147,12 @@ void StoreBatch::clear() {
   metrics_.clear();
   power_.clear();
   rtcMessages_.clear();
-  names_.clear();
-  nameSlots_.fill(0);
+  lifeRows_.clear();
+  kinds_.clear();
+  kindSlots_.fill(0);
+  stretches_.clear();
+  lives_.clear();
   sessions_.clear();
-  sessionUsers_.clear();
   text_.clear();
   if (text_.capacity() > kKeptBytes) std::string().swap(text_);
   shareable_ = {};
@@ -140,25 +175,33 @@ void StoreBatch::count(std::size_t bytes, const StoreRowOwner& owner) {
   if (owner.position.sequence != 0) marks_[owner.user] = owner.position;
 }
 
-std::uint32_t StoreBatch::indexOf(const EventNames& names) {
-  std::uint32_t& slot = nameSlots_[EventNamesHash{}(names) % kNameSlots];
-  if (slot == 0 || names_[slot - 1] != names) {
-    names_.push_back(names);
-    slot = static_cast<std::uint32_t>(names_.size());
+std::uint32_t StoreBatch::indexOf(EventKind kind) {
+  std::uint32_t& slot = kindSlots_[EventKindHash{}(kind) % kKindSlots];
+  if (slot == 0 || kinds_[slot - 1] != kind) {
+    kinds_.push_back(std::move(kind));
+    slot = static_cast<std::uint32_t>(kinds_.size());
   }
   return slot - 1;
 }
 
-std::size_t StoreBatch::indexOf(const std::shared_ptr<RtcSessionRecord>& session, std::uint32_t user) {
-  // Messages of few sessions take turns.
+template <typename Object>
+std::size_t StoreBatch::SharedObjects<Object>::indexOf(const std::shared_ptr<Object>& object,
+                                                       std::uint32_t user) {
+  // Rows of few sessions take turns.
   constexpr std::size_t kCompared = 16;
-  const std::size_t end = sessions_.size() > kCompared ? sessions_.size() - kCompared : 0;
-  for (std::size_t at = sessions_.size(); at > end; --at) {
-    if (sessions_[at - 1] == session) return at - 1;
+  const std::size_t end = shared.size() > kCompared ? shared.size() - kCompared : 0;
+  for (std::size_t at = shared.size(); at > end; --at) {
+    if (shared[at - 1] == object) return at - 1;
   }
-  sessions_.push_back(session);
-  sessionUsers_.push_back(user);
-  return sessions_.size() - 1;
+  shared.push_back(object);
+  users.push_back(user);
+  return shared.size() - 1;
+}
+
+template <typename Object>
+void StoreBatch::SharedObjects<Object>::clear() {
+  shared.clear();
+  users.clear();
 }
 
 }  // namespace tonewerk

@@ -40,6 +40,7 @@ class StoreRowText {
   explicit StoreRowText(const PowerRow& row);
   explicit StoreRowText(const RtcSessionRow& row);
   explicit StoreRowText(const RtcMessageRow& row);
+  explicit StoreRowText(const LifeRow& row);
   StoreRowText(const StoreRowText&) = delete;
   StoreRowText& operator=(const StoreRowText&) = delete;
   // Keeps the buffer for the next row, unless it is large.
@@ -73,6 +74,7 @@ class StoreBatch {
     std::size_t begin = 0;
     std::size_t size = 0;
   };
+  static constexpr std::uint32_t kNone = 0xFFFFFFFF;
   // What makes an analytics row a real-time-communication message, too.
   struct Shared {
     std::size_t session = 0;  // index in sessions()
@@ -82,9 +84,11 @@ class StoreBatch {
   };
   struct Analytics {
     double recordedAt = 0.0;
-    std::uint32_t names = 0;  // index in names()
+    std::uint32_t kind = 0;  // index in kinds()
     std::uint32_t user = kNoUser;
     Part payload;
+    std::uint32_t life = kNone;     // index in lives()
+    std::uint32_t stretch = kNone;  // index in stretches()
     std::optional<Shared> rtc;
   };
   struct Metric {
@@ -110,18 +114,30 @@ class StoreBatch {
     std::size_t eventsBefore = 0;  // the number of analytics rows that were added before it
   };
 
+  // What became of a session's life.
+  struct Session {
+    std::uint32_t life = 0;  // index in lives()
+    Part application;        // empty when it is not known
+    Part process;
+    std::optional<SessionEnd> end;
+  };
+  // Longer names of applications and processes are cut.
+  static constexpr std::size_t kMaxNameBytes = 128;
+
   // The bytes that a row takes in a batch.
   static std::size_t bytesOf(const AnalyticsRow& row, const StoreRowText& text);
   static std::size_t bytesOf(const MetricRow& row, const StoreRowText& text);
   static std::size_t bytesOf(const PowerRow& row, const StoreRowText& text);
   static std::size_t bytesOf(const RtcSessionRow& row, const StoreRowText& text);
   static std::size_t bytesOf(const RtcMessageRow& row, const StoreRowText& text);
+  static std::size_t bytesOf(const LifeRow& row, const StoreRowText& text);
 
   void add(const AnalyticsRow& row, const StoreRowText& text, const StoreRowOwner& owner = {});
   void add(const MetricRow& row, const StoreRowText& text, const StoreRowOwner& owner = {});
   void add(const PowerRow& row, const StoreRowText& text, const StoreRowOwner& owner = {});
   void add(const RtcSessionRow& row, const StoreRowText& text, const StoreRowOwner& owner = {});
   void add(const RtcMessageRow& row, const StoreRowText& text, const StoreRowOwner& owner = {});
+  void add(const LifeRow& row, const StoreRowText& text, const StoreRowOwner& owner = {});
 
   // Makes the newest row, of the analytics events and the real-time-communication messages, a row of both.
   // True when it is an event of the same user with the payload of `row`, recorded at most kSameMomentSeconds
@@ -155,33 +171,52 @@ class StoreBatch {
   std::span<const Metric> metrics() const { return metrics_; }
   std::span<const Power> power() const { return power_; }
   std::span<const RtcMessage> rtcMessages() const { return rtcMessages_; }
-  // What the analytics rows are called. The same names may be there more than once.
-  std::span<const EventNames> names() const { return names_; }
+  // Of the analytics rows. The same kind may be there more than once.
+  std::span<const EventKind> kinds() const { return kinds_; }
+  // Of the summaries among the analytics rows.
+  std::span<const TimeStretch> stretches() const { return stretches_; }
+  // The lives of the sessions that rows belong to, in the order of recording. One may be there more than
+  // once.
+  std::span<const std::shared_ptr<SessionLife>> lives() const { return lives_.shared; }
+  // The user of each of them: that of the first row in the batch that named the life.
+  std::span<const std::uint32_t> lifeUsers() const { return lives_.users; }
+  std::span<const Session> lifeRows() const { return lifeRows_; }
   // The sessions of session rows and message rows, in the order of recording. One may be there more than
   // once.
-  std::span<const std::shared_ptr<RtcSessionRecord>> sessions() const { return sessions_; }
+  std::span<const std::shared_ptr<RtcSessionRecord>> sessions() const { return sessions_.shared; }
   // The user of each of them: that of the first row in the batch that named the session.
-  std::span<const std::uint32_t> sessionUsers() const { return sessionUsers_; }
+  std::span<const std::uint32_t> sessionUsers() const { return sessions_.users; }
   // Valid until the next add() or clear().
   std::string_view text(Part part) const { return std::string_view(text_).substr(part.begin, part.size); }
 
  private:
-  // Where the newest names with a hash are in names_: so the same names are mostly there once.
-  static constexpr std::size_t kNameSlots = 256;
+  // Where the newest kind with a hash is in kinds_: so the same kind is mostly there once.
+  static constexpr std::size_t kKindSlots = 256;
+
+  // What several rows share, and the user of the first row that named it.
+  template <typename Object>
+  struct SharedObjects {
+    std::vector<std::shared_ptr<Object>> shared;
+    std::vector<std::uint32_t> users;
+
+    std::size_t indexOf(const std::shared_ptr<Object>& object, std::uint32_t user);
+    void clear();
+  };
 
   Part append(std::string_view text);
   void count(std::size_t bytes, const StoreRowOwner& owner);
-  std::uint32_t indexOf(const EventNames& names);
-  std::size_t indexOf(const std::shared_ptr<RtcSessionRecord>& session, std::uint32_t user);
+  std::uint32_t indexOf(EventKind kind);
 
   std::vector<Analytics> analytics_;
   std::vector<Metric> metrics_;
   std::vector<Power> power_;
   std::vector<RtcMessage> rtcMessages_;
-  std::vector<EventNames> names_;
-  std::array<std::uint32_t, kNameSlots> nameSlots_{};  // index in names_ plus 1, or 0
-  std::vector<std::shared_ptr<RtcSessionRecord>> sessions_;
-  std::vector<std::uint32_t> sessionUsers_;
+  std::vector<Session> lifeRows_;
+  std::vector<EventKind> kinds_;
+  std::array<std::uint32_t, kKindSlots> kindSlots_{};  // index in kinds_ plus 1, or 0
+  std::vector<TimeStretch> stretches_;
+  SharedObjects<SessionLife> lives_;
+  SharedObjects<RtcSessionRecord> sessions_;
   std::string text_;
   // The payload of the last analytics row, while that row can be shared. Empty otherwise. Holding it keeps
   // its storage from being written, or used again for another message.

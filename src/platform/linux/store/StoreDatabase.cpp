@@ -9,6 +9,7 @@
 #include <utility>
 
 #include "platform/linux/store/StoreSchema.h"
+#include "platform/linux/store/StoreViews.h"
 
 namespace tonewerk {
 namespace {
@@ -35,11 +36,13 @@ StoreDatabase::Result StoreDatabase::write(const StoreBatch& batch) {
   if (!begin_.run() || !insert(batch) || !commit_.run()) return fail();
   holdings_.commit();
   rtc_->committed();
+  lives_->committed();
   return Result::kDone;
 }
 
 bool StoreDatabase::insert(const StoreBatch& batch) {
-  if (!holdings_.add(batch) || !rtc_->insertSessions(batch)) return false;
+  if (!holdings_.add(batch) || !lives_->write(batch) || !rtc_->insertSessions(batch)) return false;
+  for (const std::uint32_t user : lives_->newRows()) holdings_.addRow(user, kStoreSessionBytes);
   for (const RtcTable::NewSession& session : rtc_->newSessions()) {
     holdings_.addRow(session.user, session.bytes);
   }
@@ -96,9 +99,7 @@ StoreDatabase::Result StoreDatabase::open() {
     return failWith("it was made by a newer version (schema " + std::to_string(*version) + ")");
   }
   if (*version == 0 && !prepareFile()) return fail();
-  if (*version == 1 && !database_.run(storeMigration())) return fail();
-  if (*version == kStoreSchemaVersion && !addUserColumns()) return fail();
-  if (*version == kStoreSchemaVersion && !addAgeTables()) return fail();
+  if (*version > 0 && *version < kStoreSchemaVersion && !migrate(*version)) return fail();
   // With this a commit costs no sync; each checkpoint makes one. A power cut loses the newest rows.
   if (!database_.run("PRAGMA journal_mode = WAL; PRAGMA synchronous = NORMAL;"
                      " PRAGMA temp_store = MEMORY")) {
@@ -112,9 +113,12 @@ StoreDatabase::Result StoreDatabase::open() {
   metrics_.emplace(database_);
   power_.emplace(database_);
   rtc_.emplace(database_, json_, fileNumber_);
+  lives_.emplace(database_, fileNumber_, 0);
   marks_.emplace(database_);
   trimmer_.emplace(database_, holdings_, clock_);
+  if (!ensureStoreViews(database_)) return fail();
   const bool isKnown = recognizeFile();
+  if (!isKnown && !LifeTable::endInterrupted(database_)) return fail();
   if (!age_.open(isKnown)) return fail();
   return Result::kDone;
 }
@@ -141,17 +145,12 @@ bool StoreDatabase::prepareFile() {
          database_.run(storeSchema());
 }
 
-bool StoreDatabase::addUserColumns() {
-  const std::optional<std::int64_t> columns =
+bool StoreDatabase::migrate(std::int64_t version) {
+  const auto users =
       database_.number("SELECT count(*) FROM pragma_table_info('analytics_row') WHERE name = 'user_id'");
-  if (!columns) return false;
-  return *columns > 0 || database_.run(storeUserColumns());
-}
-
-bool StoreDatabase::addAgeTables() {
   const auto ages = database_.number("SELECT count(*) FROM sqlite_master WHERE name = 'age_clock'");
-  if (!ages) return false;
-  return *ages > 0 || database_.run(storeAgeTables());
+  if (!users || !ages) return false;
+  return database_.run(storeMigration({version, *users > 0, *ages > 0}));
 }
 
 void StoreDatabase::applyBounds() {
@@ -195,6 +194,7 @@ void StoreDatabase::close() {
   metrics_.reset();
   power_.reset();
   rtc_.reset();
+  lives_.reset();
   trimmer_.reset();
   marks_.reset();
   database_.close();

@@ -7,6 +7,7 @@
 #include <sys/types.h>
 
 #include "platform/linux/store/AnalyticsTable.h"
+#include "platform/linux/store/LifeTable.h"
 #include "platform/linux/store/MetricTable.h"
 #include "platform/linux/store/PowerTable.h"
 #include "platform/linux/store/RtcTable.h"
@@ -63,9 +64,8 @@ class StoreDatabase {
  private:
   [[nodiscard]] Result open();
   [[nodiscard]] bool prepareFile();
-  // When they are missing, since an earlier daemon made the file.
-  [[nodiscard]] bool addUserColumns();
-  [[nodiscard]] bool addAgeTables();
+  // A file of an earlier version becomes one of this version.
+  [[nodiscard]] bool migrate(std::int64_t version);
   [[nodiscard]] bool insert(const StoreBatch& batch);
   void applyBounds();
   // Whether the path has the same file as before. Forgets what users hold if not.
@@ -91,6 +91,7 @@ class StoreDatabase {
   std::optional<MetricTable> metrics_;
   std::optional<PowerTable> power_;
   std::optional<RtcTable> rtc_;
+  std::optional<LifeTable> lives_;
   std::optional<StoreMarkTable> marks_;
   std::optional<StoreTrimmer> trimmer_;
   // Numbers the files that this process began or found; this is the open one's number.

@@ -3,6 +3,7 @@
 
 #include <algorithm>
 #include <optional>
+#include <span>
 #include <string>
 
 namespace tonewerk {
@@ -73,8 +74,11 @@ bool StoreHoldings::add(const StoreBatch& batch) {
     return true;
   };
   const auto payload = [](const auto& row) { return row.payload; };
-  return std::all_of(batch.sessionUsers().begin(), batch.sessionUsers().end(),
-                     [this](std::uint32_t user) { return holdingOf(user) != nullptr; }) &&
+  const auto haveHoldings = [this](std::span<const std::uint32_t> users) {
+    return std::all_of(users.begin(), users.end(),
+                       [this](std::uint32_t user) { return holdingOf(user) != nullptr; });
+  };
+  return haveHoldings(batch.lifeUsers()) && haveHoldings(batch.sessionUsers()) &&
          addAll(batch.analytics(), payload) && addAll(batch.power(), payload) &&
          addAll(batch.rtcMessages(), payload) &&
          addAll(batch.metrics(), [](const StoreBatch::Metric& row) { return row.record; });

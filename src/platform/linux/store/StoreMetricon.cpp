@@ -22,10 +22,10 @@ void StoreMetricon::readConsumersAgain() {
   isStale_ = true;
 }
 
-void StoreMetricon::sendEvent(const EventNames& names, const EventSubject& /*subject*/,
+void StoreMetricon::sendEvent(const EventNames& names, const EventSubject& subject,
                               FunctionRef<ValueMap()> payload) {
   std::optional<EventNames> used = usedOf(names);
-  if (used) store_.recordEvent(clock_.now(), std::move(*used), payload());
+  if (used) store_.recordEvent(clock_.now(), std::move(*used), payload(), subject);
 }
 
 std::optional<EventNames> StoreMetricon::usedOf(const EventNames& names) {

@@ -4,10 +4,13 @@
 #include <cstddef>
 #include <cstdint>
 #include <memory>
+#include <optional>
 #include <string>
 #include <string_view>
+#include <utility>
 
 #include "platform/Metricon.h"
+#include "platform/SessionBook.h"
 #include "values/Value.h"
 
 namespace tonewerk {
@@ -19,6 +22,27 @@ struct EventNamesHash {
   }
 };
 
+// What the names of an event say. Of a message it says a little more: its category and type make the names,
+// but cannot be read from them.
+struct EventKind {
+  EventKind() = default;
+  EventKind(EventNames itsNames, const EventSubject& subject)
+      : names(std::move(itsNames)), category(subject.category), type(subject.type), source(subject.source) {}
+
+  friend bool operator==(const EventKind&, const EventKind&) = default;
+
+  EventNames names;
+  AudioEventCategory category = kCategoryUnknown;
+  AudioEventType type = kTypeUnknown;
+  EventSource source = EventSource::kUnknown;
+};
+
+struct EventKindHash {
+  std::size_t operator()(const EventKind& kind) const {
+    return EventNamesHash{}(kind.names) * 31 + static_cast<std::size_t>(kind.source);
+  }
+};
+
 // What is recorded, one type for each of the store's tables.
 
 // An analytics event: one payload under one or two names.
@@ -26,6 +50,15 @@ struct AnalyticsRow {
   double recordedAt = 0.0;  // seconds since 1970
   EventNames names;
   ValueMap payload;
+  EventSubject subject = {};
+};
+
+// A life of a session, or what it has become.
+struct LifeRow {
+  std::shared_ptr<SessionLife> life;
+  SharedString application;  // empty when it is not known
+  SharedString process;      // empty when it is not known
+  std::optional<SessionEnd> end = {};
 };
 
 // A posted metric record.

@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/store/StoreSchema.h"
 
+#include "platform/linux/store/StoreViews.h"
+
 namespace tonewerk {
 namespace {
 
@@ -10,9 +12,10 @@ namespace {
 constexpr std::string_view kTables = R"(
   CREATE TABLE analytics_row (
     id INTEGER PRIMARY KEY, recorded_at REAL NOT NULL, name_set INTEGER NOT NULL, payload TEXT NOT NULL,
-    rtc_session INTEGER, rtc_bits INTEGER, user_id INTEGER);
+    rtc_session INTEGER, rtc_bits INTEGER, user_id INTEGER, session INTEGER, began_at REAL, ended_at REAL);
   CREATE TABLE analytics_name (
     name_set INTEGER NOT NULL, position INTEGER NOT NULL, name TEXT NOT NULL,
+    category TEXT, type TEXT, source TEXT,
     PRIMARY KEY (name_set, position)) WITHOUT ROWID;
   CREATE INDEX analytics_name_by_name ON analytics_name (name);
   CREATE TABLE metric (
@@ -30,12 +33,24 @@ constexpr std::string_view kTables = R"(
     user_id INTEGER);
 )";
 
+// The lives of sessions. Their rows are written at the start and at the end, not with each message.
+constexpr std::string_view kSessionTable = R"(
+  CREATE TABLE session_row (
+    id INTEGER PRIMARY KEY, started_at REAL NOT NULL, request INTEGER, reporter_id INTEGER NOT NULL,
+    service TEXT, application TEXT, process TEXT, ended_at REAL, ending TEXT, messages INTEGER,
+    redundant_messages INTEGER, active_seconds REAL, overloads INTEGER, user_id INTEGER);
+)";
+
+// Only summaries are in it, so a message costs nothing.
+constexpr std::string_view kStretchIndex =
+    "CREATE INDEX analytics_row_by_stretch ON analytics_row (began_at) WHERE began_at IS NOT NULL;";
+
 // How old the rows are: see StoreAge. A mark names the newest row of each table.
 constexpr std::string_view kAgeTables = R"(
   CREATE TABLE age_mark (
     id INTEGER PRIMARY KEY, age REAL NOT NULL, time_off REAL NOT NULL,
     analytics_row INTEGER NOT NULL, metric INTEGER NOT NULL, power_event INTEGER NOT NULL,
-    rtc_session INTEGER NOT NULL, rtc_row INTEGER NOT NULL);
+    rtc_session INTEGER NOT NULL, rtc_row INTEGER NOT NULL, session_row INTEGER NOT NULL DEFAULT 0);
   CREATE TABLE age_clock (
     id INTEGER PRIMARY KEY, age REAL NOT NULL, wall REAL NOT NULL, uptime REAL NOT NULL);
 )";
@@ -70,13 +85,29 @@ constexpr std::string_view kFromVersion1 = R"(
   ALTER TABLE rtc_message RENAME TO rtc_row;
 )";
 
-std::string userColumns() {
-  std::string sql;
-  for (const StoreTable& table : kStoreTables) {
-    sql.append("ALTER TABLE ").append(table.name).append(" ADD COLUMN user_id INTEGER;");
-  }
-  return sql;
-}
+constexpr std::string_view kUserColumns = R"(
+  ALTER TABLE analytics_row ADD COLUMN user_id INTEGER;
+  ALTER TABLE metric ADD COLUMN user_id INTEGER;
+  ALTER TABLE power_event ADD COLUMN user_id INTEGER;
+  ALTER TABLE rtc_session ADD COLUMN user_id INTEGER;
+  ALTER TABLE rtc_row ADD COLUMN user_id INTEGER;
+)";
+
+// Category and type are in the framework's name. Who has made a message is not known.
+constexpr std::string_view kFromVersion2 = R"(
+  ALTER TABLE analytics_row ADD COLUMN session INTEGER;
+  ALTER TABLE analytics_row ADD COLUMN began_at REAL;
+  ALTER TABLE analytics_row ADD COLUMN ended_at REAL;
+  ALTER TABLE analytics_name ADD COLUMN category TEXT;
+  ALTER TABLE analytics_name ADD COLUMN type TEXT;
+  ALTER TABLE analytics_name ADD COLUMN source TEXT;
+  UPDATE analytics_name SET category = substr(name, 21, instr(substr(name, 21), '.') - 1),
+                            type = substr(name, 21 + instr(substr(name, 21), '.'))
+    WHERE position = 0 AND name GLOB 'com.orvane.tonewerk.*.*' AND name NOT GLOB 'com.orvane.tonewerk.*.*.*';
+)";
+
+constexpr std::string_view kAgeOfSessions =
+    "ALTER TABLE age_mark ADD COLUMN session_row INTEGER NOT NULL DEFAULT 0;";
 
 std::string inTransaction(const std::string& sql) {
   return "BEGIN IMMEDIATE;" + sql + "PRAGMA user_version = " + std::to_string(kStoreSchemaVersion) +
@@ -87,22 +118,25 @@ std::string inTransaction(const std::string& sql) {
 
 std::string storeSchema() {
   std::string sql(kTables);
+  sql += kSessionTable;
+  sql += kStretchIndex;
   sql += kAgeTables;
   sql += kAnalyticsView;
   sql += kRtcView;
+  sql += storeViewsSql();
   return inTransaction(sql);
 }
 
-std::string storeMigration() {
-  std::string sql(kFromVersion1);
-  sql += userColumns();
-  sql += kAgeTables;
-  sql += kRtcView;
+std::string storeMigration(const EarlierStore& store) {
+  std::string sql;
+  if (store.version == 1) sql.append(kFromVersion1).append(kRtcView);
+  if (!store.hasUsers) sql += kUserColumns;
+  sql += kFromVersion2;
+  sql += kSessionTable;
+  sql += kStretchIndex;
+  sql += store.hasAges ? kAgeOfSessions : kAgeTables;
+  sql += storeViewsSql();
   return inTransaction(sql);
 }
-
-std::string storeUserColumns() { return inTransaction(userColumns()); }
-
-std::string storeAgeTables() { return inTransaction(std::string(kAgeTables)); }
 
 }  // namespace tonewerk

@@ -14,7 +14,7 @@ namespace tonewerk {
 // The report store's file with its tables and views. docs/store.md explains them to those who query them.
 
 inline constexpr std::string_view kStoreFileName = "reports.db";
-inline constexpr std::int64_t kStoreSchemaVersion = 2;
+inline constexpr std::int64_t kStoreSchemaVersion = 3;
 
 // An analytics event's identifier is its row's identifier times this, plus the position of its name in the
 // row.
@@ -39,7 +39,10 @@ struct StoreTable {
   std::string_view empty;  // an assignment that removes that from a row
 };
 
-inline constexpr std::array<StoreTable, 5> kStoreTables{{
+// What the row of a session's life counts: its names are short, and change while it lives.
+inline constexpr std::int64_t kStoreSessionBytes = 128;
+
+inline constexpr std::array<StoreTable, 6> kStoreTables{{
     {"analytics_row", "recorded_at", "length(CAST(payload AS BLOB))",
      "payload = '{}', rtc_bits = rtc_bits & 0xffffffff"},
     {"metric", "posted_at", "length(record)", "record = x''"},
@@ -47,7 +50,10 @@ inline constexpr std::array<StoreTable, 5> kStoreTables{{
     {"rtc_session", "started_at", "length(CAST(session_info AS BLOB)) + length(CAST(user_info AS BLOB))",
      "session_info = '{}', user_info = '{}'"},
     {"rtc_row", "sent_at", "length(CAST(payload AS BLOB))", "payload = '{}'"},
+    {"session_row", "started_at", "128", "application = NULL, process = NULL"},
 }};
+
+static_assert(kStoreSessionBytes == 128 && kStoreTables.back().bytes == "128", "they say the same");
 
 // An identifier for each of kStoreTables.
 using StoreRowIds = std::array<std::int64_t, kStoreTables.size()>;
@@ -58,15 +64,18 @@ inline constexpr std::int64_t kStoreRowBytes = 32;
 // The SQL that makes the schema in an empty database, user_version included, in one transaction.
 std::string storeSchema();
 
-// The SQL that turns a database of version 1 into one of this version, in one transaction that writes few
-// pages. In version 1 rtc_message was a table, and analytics_row had no columns for messages.
-std::string storeMigration();
+// What a database of an earlier version has.
+struct EarlierStore {
+  std::int64_t version = 0;
+  bool hasUsers = false;  // the columns for users, which the first files of version 2 lack
+  bool hasAges = false;   // the tables of StoreAge, which they lack, too
+};
 
-// The SQL that gives the tables of an earlier file of this version the column with the user, in one
-// transaction that writes few pages. Programs that do not know the column can read and write the file.
-std::string storeUserColumns();
-
-// The SQL that makes the tables of StoreAge in an earlier file of this version, in one transaction.
-std::string storeAgeTables();
+// The SQL that turns such a database into one of this version, in one transaction. It writes few pages, and
+// reads the rows once.
+//
+//   version 1 -> 2   rtc_message was a table; analytics_row gets columns for messages
+//   version 2 -> 3   rows know their session, and summaries when their stretch began and ended
+std::string storeMigration(const EarlierStore& store);
 
 }  // namespace tonewerk

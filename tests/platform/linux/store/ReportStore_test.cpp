@@ -376,7 +376,7 @@ TEST_F(ReportStoreTest, MakesTheWholeSchema) {
   recordNumbered(1);
   ASSERT_TRUE(flush());
 
-  EXPECT_EQ(number("PRAGMA user_version"), 2);
+  EXPECT_EQ(number("PRAGMA user_version"), 3);
   EXPECT_EQ(number("PRAGMA auto_vacuum"), 2);
   EXPECT_EQ(number("SELECT count(*) FROM (SELECT id, posted_at, identifier, record FROM metric)"), 0);
   EXPECT_EQ(
@@ -683,7 +683,7 @@ TEST_F(ReportStoreTest, DoesNotChangeAFileOfANewerVersion) {
   close();
   SqliteDatabase other;
   ASSERT_TRUE(other.open(file(), SqliteDatabase::Mode::kReadWrite, kLongEnough));
-  ASSERT_TRUE(other.run("PRAGMA user_version = 3"));
+  ASSERT_TRUE(other.run("PRAGMA user_version = 4"));
   other.close();
 
   open();
@@ -691,9 +691,9 @@ TEST_F(ReportStoreTest, DoesNotChangeAFileOfANewerVersion) {
   EXPECT_FALSE(flush());
   close();
   EXPECT_THAT(events(), SizeIs(1));
-  EXPECT_EQ(number("PRAGMA user_version"), 3);
+  EXPECT_EQ(number("PRAGMA user_version"), 4);
   EXPECT_THAT(errors(),
-              ElementsAre(HasSubstr("newer version (schema 3)"), HasSubstr("could not be written")));
+              ElementsAre(HasSubstr("newer version (schema 4)"), HasSubstr("could not be written")));
 }
 
 TEST_F(ReportStoreTest, DeletesRowsThatAreOlderThanTheBound) {

@@ -1,7 +1,9 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <cstdint>
 #include <filesystem>
+#include <fstream>
 #include <gmock/gmock.h>
+#include <iterator>
 #include <memory>
 #include <string>
 #include <vector>
@@ -25,39 +27,13 @@ using testing::SizeIs;
 
 constexpr std::chrono::seconds kLongEnough{30};
 
+constexpr const char* kFolder = TONEWERK_SOURCE_DIR "/tests/platform/linux/store/";
+
 // A file as daemons before version 2 made it, with some rows.
-constexpr const char* kVersion1 = R"(
-  PRAGMA page_size = 8192; PRAGMA auto_vacuum = INCREMENTAL; PRAGMA journal_mode = WAL;
-  BEGIN;
-  CREATE TABLE analytics_row (
-    id INTEGER PRIMARY KEY, recorded_at REAL NOT NULL, name_set INTEGER NOT NULL, payload TEXT NOT NULL);
-  CREATE TABLE analytics_name (
-    name_set INTEGER NOT NULL, position INTEGER NOT NULL, name TEXT NOT NULL,
-    PRIMARY KEY (name_set, position)) WITHOUT ROWID;
-  CREATE INDEX analytics_name_by_name ON analytics_name (name);
-  CREATE TABLE metric (
-    id INTEGER PRIMARY KEY, posted_at REAL NOT NULL, identifier INTEGER NOT NULL, record BLOB NOT NULL);
-  CREATE TABLE power_event (
-    id INTEGER PRIMARY KEY, recorded_at REAL NOT NULL, event_group INTEGER NOT NULL, name TEXT NOT NULL,
-    payload TEXT NOT NULL);
-  CREATE TABLE rtc_session (
-    id INTEGER PRIMARY KEY, started_at REAL NOT NULL, session_info TEXT NOT NULL,
-    user_info TEXT NOT NULL);
-  CREATE TABLE rtc_message (
-    id INTEGER PRIMARY KEY, sent_at REAL NOT NULL, rtc_session INTEGER NOT NULL,
-    category INTEGER NOT NULL, type INTEGER NOT NULL, payload TEXT NOT NULL);
-  CREATE VIEW analytics_event (id, recorded_at, name, payload) AS
-    SELECT r.id * 2 + n.position, r.recorded_at, n.name, r.payload
-      FROM analytics_row AS r CROSS JOIN analytics_name AS n ON n.name_set = r.name_set;
-  INSERT INTO analytics_name VALUES (1, 0, 'first'), (1, 1, 'second'), (2, 0, 'single');
-  INSERT INTO analytics_row VALUES (10, 1.5, 1, '{"n":1}'), (12, 2.5, 2, '{"n":2}');
-  INSERT INTO metric VALUES (3, 1.5, 7, x'00ff');
-  INSERT INTO power_event VALUES (4, 1.5, 28, 'power', '{"p":1}');
-  INSERT INTO rtc_session VALUES (5, 1.5, '{"s":1}', '{"kLinkReportUserInfoServiceName":"telephony_session"}');
-  INSERT INTO rtc_message VALUES (10, 1.5, 5, 4, 1, '{"m":1}'), (20, 2.5, 5, 4, 2, '{"m":2}');
-  PRAGMA user_version = 1;
-  COMMIT;
-)";
+std::string version1() {
+  std::ifstream file(std::string(kFolder) + "version1.sql");
+  return {std::istreambuf_iterator<char>(file), {}};
+}
 
 // A file as daemons made it before they recorded the users of rows, with some rows.
 constexpr const char* kWithoutUsers = R"(
@@ -112,7 +88,7 @@ constexpr const char* kColumns =
 
 class OldFileTest : public testing::Test {
  protected:
-  explicit OldFileTest(const char* contents) {
+  explicit OldFileTest(const std::string& contents) {
     EXPECT_TRUE(file_.open(path(), SqliteDatabase::Mode::kReadWrite, kLongEnough));
     EXPECT_TRUE(file_.run(contents)) << file_.problem();
   }
@@ -152,7 +128,7 @@ class OldFileTest : public testing::Test {
 
 class StoreMigrationTest : public OldFileTest {
  protected:
-  StoreMigrationTest() : OldFileTest(kVersion1) {}
+  StoreMigrationTest() : OldFileTest(version1()) {}
 };
 
 class FileWithoutUsersTest : public OldFileTest {
@@ -166,6 +142,37 @@ TEST_F(StoreMigrationTest, KeepsAllRowsAndTheirIdentifiers) {
   EXPECT_EQ(write(), StoreDatabase::Result::kDone);
   EXPECT_EQ(version(), kStoreSchemaVersion);
   EXPECT_EQ(contents(), before);
+}
+
+TEST_F(StoreMigrationTest, CategoryAndTypeOfEarlierMessagesAreThoseOfTheFrameworksName) {
+  ASSERT_TRUE(
+      file_.run("INSERT INTO analytics_name VALUES (8, 0, 'com.orvane.tonewerk.HAL_IO.Error'),"
+                " (8, 1, 'com.orvane.telephony.HAL_IO.Error'), (9, 0, 'com.orvane.telephony.IO.Error');"
+                "INSERT INTO analytics_row (id, recorded_at, name_set, payload) VALUES"
+                " (50, 1.5, 8, '{\"issue_type\":\"overload\"}'), (51, 1.5, 9, '{}')"));
+  EXPECT_EQ(write(), StoreDatabase::Result::kDone);
+  EXPECT_THAT(rows("SELECT id, category, type, session IS NULL, source IS NULL FROM event", 5),
+              ElementsAre("50 HAL_IO Error 1 1"));
+  EXPECT_THAT(rows("SELECT id, kind FROM issue", 2), ElementsAre("50 overload"));
+}
+
+// The bytes that an earlier SQLite has written, whatever this one would write.
+TEST_F(StoreMigrationTest, AFileOfVersionOneThatIsKeptShowsTheSameInAllViews) {
+  const std::vector<std::string> before = contents();
+  const TemporaryDirectory kept;
+  std::filesystem::copy_file(std::string(kFolder) + "version1.db", kept.path("reports.db"));
+  ASSERT_TRUE(file_.open(kept.path("reports.db"), SqliteDatabase::Mode::kReadWrite, kLongEnough));
+  EXPECT_EQ(version(), 1);
+  EXPECT_EQ(contents(), before);
+  StoreDatabase store(kept.path(), json_, clock_);
+  EXPECT_EQ(store.write({}), StoreDatabase::Result::kDone) << store.problem();
+  EXPECT_EQ(version(), kStoreSchemaVersion);
+  EXPECT_THAT(contents(),
+              ElementsAre(R"(20 1.5 first {"n":1})", R"(21 1.5 second {"n":1})", R"(24 2.5 single {"n":2})",
+                          R"(3 1.5 7 00FF)", R"(4 1.5 28 power {"p":1})",
+                          R"(5 1.5 {"s":1} {"kLinkReportUserInfoServiceName":"telephony_session"})",
+                          R"(10 1.5 5 4 1 {"m":1})", R"(20 2.5 5 4 2 {"m":2})"));
+  EXPECT_THAT(rows("PRAGMA integrity_check"), ElementsAre("ok"));
 }
 
 TEST_F(StoreMigrationTest, NewRowsFollowTheOldOnes) {
@@ -201,7 +208,7 @@ TEST_F(FileWithoutUsersTest, KeepsItsRowsAndItsViewsAndGetsTheColumnsOfANewFile)
   ASSERT_THAT(before, SizeIs(8));
   EXPECT_EQ(write(), StoreDatabase::Result::kDone);
   EXPECT_EQ(contents(), before);
-  EXPECT_EQ(version(), 2);
+  EXPECT_EQ(version(), kStoreSchemaVersion);
   const std::vector<std::string> columns = rows(kColumns, 6);
   EXPECT_THAT(columns, Contains("table analytics_row user_id INTEGER 0 0"));
   const TemporaryDirectory directory;
@@ -228,7 +235,7 @@ TEST_F(FileWithoutUsersTest, AFailureInTheMiddleLeavesItWithoutUsers) {
 
   ASSERT_TRUE(file_.run("ALTER TABLE rtc_row DROP COLUMN user_id"));
   EXPECT_EQ(write(), StoreDatabase::Result::kDone);
-  EXPECT_EQ(file_.number("SELECT count(*) FROM pragma_table_info('analytics_row')"), 7);
+  EXPECT_EQ(file_.number("SELECT count(*) FROM pragma_table_info('analytics_row')"), 10);
 }
 
 // A crash leaves a transaction without its end, as a failure does.
@@ -266,7 +273,7 @@ TEST_F(StoreMigrationTest, AFullDiskLeavesTheOldVersionUntilThereIsRoom) {
     EXPECT_EQ(store_.problem(), "disk I/O error");
     ASSERT_EQ(contents(), before);
     // What follows the migration may have failed.
-    const int columns = version() == 1 ? 4 : 7;
+    const int columns = version() == 1 ? 4 : 10;
     ASSERT_EQ(file_.number("SELECT count(*) FROM pragma_table_info('analytics_row')"), columns);
     ASSERT_THAT(rows("PRAGMA integrity_check"), ElementsAre("ok"));
   }

@@ -1,0 +1,156 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "platform/linux/store/LifeTable.h"
+
+#include <string_view>
+
+namespace tonewerk {
+namespace {
+
+std::string_view textOf(SessionEnding ending) {
+  switch (ending) {
+    case SessionEnding::kStopped:
+      return "stopped";
+    case SessionEnding::kReplaced:
+      return "replaced";
+    case SessionEnding::kDisconnected:
+      return "disconnected";
+    case SessionEnding::kInterrupted:
+      break;
+  }
+  return "interrupted";
+}
+
+void bindName(SqliteStatement& statement, int parameter, std::string_view name) {
+  if (name.empty()) {
+    statement.bindNull(parameter);
+  } else {
+    statement.bind(parameter, name);
+  }
+}
+
+}  // namespace
+
+LifeTable::LifeTable(SqliteDatabase& database, std::uint64_t fileNumber, std::int64_t floor)
+    : database_(database),
+      fileNumber_(fileNumber),
+      floor_(floor),
+      insert_(
+          database.prepare("INSERT INTO session_row (id, started_at, request, reporter_id, service, user_id)"
+                           " VALUES (?6, ?1, ?2, ?3, ?4, ?5)")),
+      change_(database.prepare(
+          "UPDATE session_row SET application = ?2, process = ?3, ended_at = ?4, ending = ?5, messages = ?6,"
+          " redundant_messages = ?7, active_seconds = ?8, overloads = ?9 WHERE id = ?1")) {}
+
+LifeTable::~LifeTable() {
+  for (const auto& life : uncommitted_) life->place = {};
+}
+
+bool LifeTable::write(const StoreBatch& batch) {
+  newRows_.clear();
+  for (std::size_t at = 0; at < batch.lives().size(); ++at) {
+    if (!place(batch.lives()[at], batch.lifeUsers()[at])) return false;
+  }
+  for (const StoreBatch::Session& row : batch.lifeRows()) {
+    if (!change(batch, row)) return false;
+  }
+  return true;
+}
+
+bool LifeTable::endInterrupted(SqliteDatabase& database) {
+  return database.run(
+      "UPDATE session_row SET ending = 'interrupted', ended_at = max(started_at, coalesce("
+      "(SELECT recorded_at FROM analytics_row ORDER BY id DESC LIMIT 1), started_at)) WHERE ended_at IS "
+      "NULL");
+}
+
+bool LifeTable::place(const std::shared_ptr<SessionLife>& life, std::uint32_t user) {
+  if (life->place.file == fileNumber_) return true;
+  const std::optional<std::int64_t> found = find(life->beginning);
+  if (!found) return false;
+  std::int64_t identifier = *found;
+  if (identifier == 0) {
+    if (!insert(life->beginning, user)) return false;
+    const auto inserted = database_.number("SELECT last_insert_rowid()");
+    if (!inserted) return false;
+    identifier = *inserted;
+    newRows_.push_back(user);
+    if (rowsFrom_) rows_[{life->beginning.request, life->beginning.reporterID}] = identifier;
+  }
+  life->place = {identifier, fileNumber_};
+  uncommitted_.push_back(life);
+  return true;
+}
+
+std::optional<std::int64_t> LifeTable::find(const SessionBeginning& beginning) {
+  if (beginning.request == 0) return 0;
+  if (!newestRequest_) {
+    const auto newest = database_.number("SELECT coalesce(max(request), 0) FROM session_row");
+    if (!newest) return std::nullopt;
+    newestRequest_ = static_cast<std::uint64_t>(*newest);
+  }
+  if (beginning.request > *newestRequest_) {
+    newestRequest_ = beginning.request;
+    rows_.clear();
+    rowsFrom_.reset();
+    return 0;
+  }
+  if ((!rowsFrom_ || beginning.request < *rowsFrom_) && !readRowsFrom(beginning.request)) return std::nullopt;
+  const auto found = rows_.find({beginning.request, beginning.reporterID});
+  return found == rows_.end() ? 0 : found->second;
+}
+
+bool LifeTable::readRowsFrom(std::uint64_t request) {
+  rows_.clear();
+  rowsFrom_ = request;
+  SqliteStatement select =
+      database_.prepare("SELECT request, reporter_id, id FROM session_row WHERE request >= ?1");
+  select.bind(1, static_cast<std::int64_t>(request));
+  SqliteStatement::Step step = SqliteStatement::Step::kDone;
+  while ((step = select.step()) == SqliteStatement::Step::kRow) {
+    rows_[{static_cast<std::uint64_t>(select.integer(0)), select.integer(1)}] = select.integer(2);
+  }
+  return step == SqliteStatement::Step::kDone;
+}
+
+bool LifeTable::insert(const SessionBeginning& beginning, std::uint32_t user) {
+  insert_.bind(1, beginning.at);
+  if (beginning.request == 0) {
+    insert_.bindNull(2);
+  } else {
+    insert_.bind(2, static_cast<std::int64_t>(beginning.request));
+  }
+  insert_.bind(3, beginning.reporterID);
+  bindName(insert_, 4, beginning.service.view());
+  if (user == kNoUser) {
+    insert_.bindNull(5);
+  } else {
+    insert_.bind(5, static_cast<std::int64_t>(user));
+  }
+  if (floor_ == 0) {
+    insert_.bindNull(6);
+  } else {
+    insert_.bind(6, floor_ + 1);
+  }
+  if (!insert_.run()) return false;
+  floor_ = 0;
+  return true;
+}
+
+bool LifeTable::change(const StoreBatch& batch, const StoreBatch::Session& row) {
+  change_.bind(1, batch.lives()[row.life]->place.identifier);
+  bindName(change_, 2, batch.text(row.application));
+  bindName(change_, 3, batch.text(row.process));
+  if (row.end) {
+    change_.bind(4, row.end->at);
+    change_.bind(5, textOf(row.end->ending));
+    change_.bind(6, static_cast<std::int64_t>(row.end->messages));
+    change_.bind(7, static_cast<std::int64_t>(row.end->redundantMessages));
+    change_.bind(8, row.end->activeSeconds);
+    change_.bind(9, static_cast<std::int64_t>(row.end->overloads));
+  } else {
+    for (int parameter = 4; parameter <= 9; ++parameter) change_.bindNull(parameter);
+  }
+  return change_.run();
+}
+
+}  // namespace tonewerk
