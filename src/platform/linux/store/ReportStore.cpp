@@ -16,6 +16,7 @@
 #include "platform/accounts/Accounts.h"
 #include "platform/linux/descriptors/FileDescriptor.h"
 #include "platform/linux/files/TextFile.h"
+#include "platform/linux/store/StoreSchema.h"
 #include "values/GrowingDelay.h"
 
 namespace tonewerk {
@@ -139,6 +140,11 @@ void ReportStore::run() {
   pthread_setname_np(pthread_self(), "tw-store");
   const Heartbeat::OnThisThread heartbeat(heartbeat_);
   heartbeat_->beat();
+  if (const std::optional<std::int64_t> newer = database_.newerSchema()) {
+    errorLog(log_,
+             "%s is used, because a newer version made the %s beside it (schema %lli), which is left alone",
+             database_.path(), kStoreFileName, *newer);
+  }
   // The file is made, and its problems are logged, before the first row is recorded.
   queue_.beginAttempt();
   if (write()) {

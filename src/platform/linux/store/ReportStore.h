@@ -32,7 +32,7 @@ class PreferenceStore;
 //
 // Recording costs the caller the JSON and a place in a bounded queue. The thread runs the SQL. When the
 // queue is full because more is recorded than the disk takes, recording waits. When the file cannot be
-// written (a full disk, a missing directory, a file of a newer version) or the disk hangs, recording does not
+// written (a full disk, a missing directory) or the disk hangs, recording does not
 // wait: rows are kept while there is room and then dropped. Their number is logged when writing succeeds
 // again, and at the end. A damaged file is moved aside.
 //

@@ -21,7 +21,8 @@ constexpr std::chrono::milliseconds kPatience{500};
 
 StoreDatabase::StoreDatabase(std::string directory, const JsonService& json, const Clock& clock)
     : directory_(std::move(directory)),
-      path_(directory_ + "/" + std::string(kStoreFileName)),
+      file_(storeFileIn(directory_)),
+      path_(file_.path),
       json_(json),
       clock_(clock),
       age_(database_, clock) {}

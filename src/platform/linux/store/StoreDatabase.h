@@ -14,6 +14,7 @@
 #include "platform/linux/store/SqliteDatabase.h"
 #include "platform/linux/store/StoreAge.h"
 #include "platform/linux/store/StoreBatch.h"
+#include "platform/linux/store/StoreFile.h"
 #include "platform/linux/store/StoreHoldings.h"
 #include "platform/linux/store/StoreMarks.h"
 #include "platform/linux/store/StoreNumbering.h"
@@ -57,7 +58,10 @@ class StoreDatabase {
   // failure it is false, and problem() describes it.
   [[nodiscard]] bool moveAside();
 
+  // Any thread.
   const std::string& path() const { return path_; }
+  // Any thread. The schema version of a newer file in whose place path() is used, if there is one.
+  std::optional<std::int64_t> newerSchema() const { return file_.newerSchema; }
   // Describes the last failure.
   const std::string& problem() const { return problem_; }
 
@@ -77,6 +81,7 @@ class StoreDatabase {
   void close();
 
   const std::string directory_;
+  const StoreFile file_;
   const std::string path_;
   const JsonService& json_;
   const Clock& clock_;

@@ -5,6 +5,7 @@
 #include <filesystem>
 #include <system_error>
 
+#include "platform/linux/store/StoreFile.h"
 #include "platform/linux/store/StoreQueries.h"
 #include "platform/linux/store/StoreSchema.h"
 
@@ -16,7 +17,7 @@ constexpr std::chrono::seconds kPatience{5};
 }  // namespace
 
 StoreReader::Outcome StoreReader::open(const std::string& directory) {
-  path_ = directory + "/" + std::string(kStoreFileName);
+  path_ = storeFileIn(directory).path;
   std::error_code error;
   if (!std::filesystem::exists(path_, error)) {
     if (error) return fail(error.message());

@@ -14,6 +14,8 @@ namespace tonewerk {
 // The report store's file with its tables and views. docs/store.md explains them to those who query them.
 
 inline constexpr std::string_view kStoreFileName = "reports.db";
+// The store's name where a newer version made the file of the usual name. It has the schema's version.
+inline constexpr std::string_view kStoreFileNameBesideNewer = "reports.3.db";
 inline constexpr std::int64_t kStoreSchemaVersion = 3;
 
 // An analytics event's identifier is its row's identifier times this, plus the position of its name in the

@@ -6,7 +6,7 @@
 #include <utility>
 #include <vector>
 
-#include "platform/linux/store/StoreSchema.h"
+#include "platform/linux/store/StoreFile.h"
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/input/Suggestion.h"
 #include "tools/twctl/show/Table.h"
@@ -19,7 +19,7 @@ using NamedPath = std::pair<std::string, std::string>;
 // There may be several sockets. Clients try them in this order.
 std::vector<NamedPath> pathsOf(const Tool& tool) {
   const Directories directories = tool.directories();
-  std::vector<NamedPath> paths{{"store", directories.state + "/" + std::string(kStoreFileName)},
+  std::vector<NamedPath> paths{{"store", storeFileIn(directories.state).path},
                                {"runtime", directories.runtime},
                                {"state", directories.state},
                                {"logs", directories.logs},

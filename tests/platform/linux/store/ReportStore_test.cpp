@@ -676,7 +676,7 @@ TEST_F(ReportStoreTest, ReportsWhyAFileCannotBeWrittenThatLacksATable) {
               testing::Contains(HasSubstr("cannot write " + file() + ": no such table: analytics_row")));
 }
 
-TEST_F(ReportStoreTest, DoesNotChangeAFileOfANewerVersion) {
+TEST_F(ReportStoreTest, LeavesAFileOfANewerVersionAloneAndBeginsOneBesideIt) {
   open();
   recordNumbered(1);
   ASSERT_TRUE(flush());
@@ -685,15 +685,48 @@ TEST_F(ReportStoreTest, DoesNotChangeAFileOfANewerVersion) {
   ASSERT_TRUE(other.open(file(), SqliteDatabase::Mode::kReadWrite, kLongEnough));
   ASSERT_TRUE(other.run("PRAGMA user_version = 4"));
   other.close();
+  const std::string before = contentsOf(file());
 
+  for (int run = 1; run <= 2; ++run) {
+    open();
+    recordNumbered(1, run);
+    EXPECT_TRUE(flush());
+    close();
+  }
+  EXPECT_EQ(contentsOf(file()), before);
+  EXPECT_FALSE(std::filesystem::exists(file() + "-wal"));
+  EXPECT_THAT(errors(), testing::Contains(AllOf(HasSubstr("reports.3.db is used"),
+                                                HasSubstr("newer version made the reports.db beside it"),
+                                                HasSubstr("(schema 4)")))
+                            .Times(2));
+  file_ = directory_ + "/reports.3.db";
+  EXPECT_THAT(payloads(), ElementsAre(R"({"n":1})", R"({"n":2})"));
+}
+
+// A newer daemon that was killed leaves the version, and rows, in the write-ahead log.
+TEST_F(ReportStoreTest, LeavesAFileAloneWhoseNewerVersionIsInItsLog) {
   open();
-  recordNumbered(1, 1);
-  EXPECT_FALSE(flush());
+  ASSERT_TRUE(flush());
   close();
-  EXPECT_THAT(events(), SizeIs(1));
+  const std::string copy = temporary_.path("killed");
+  {
+    SqliteDatabase other;
+    ASSERT_TRUE(other.open(file(), SqliteDatabase::Mode::kReadWrite, kLongEnough));
+    ASSERT_TRUE(other.run("PRAGMA user_version = 4"));
+    std::filesystem::copy(directory_, copy);
+  }
+  directory_ = copy;
+  file_ = copy + "/reports.db";
+  const std::string before = contentsOf(file()) + contentsOf(file() + "-wal");
+  ASSERT_FALSE(contentsOf(file() + "-wal").empty());
+  open();
+  recordNumbered(1);
+  EXPECT_TRUE(flush());
+  close();
+  EXPECT_EQ(contentsOf(file()) + contentsOf(file() + "-wal"), before);
   EXPECT_EQ(number("PRAGMA user_version"), 4);
-  EXPECT_THAT(errors(),
-              ElementsAre(HasSubstr("newer version (schema 4)"), HasSubstr("could not be written")));
+  file_ = copy + "/reports.3.db";
+  EXPECT_THAT(payloads(), ElementsAre(R"({"n":0})"));
 }
 
 TEST_F(ReportStoreTest, DeletesRowsThatAreOlderThanTheBound) {
