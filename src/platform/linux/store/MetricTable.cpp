@@ -1,18 +1,25 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/store/MetricTable.h"
 
+#include <string>
+
 namespace tonewerk {
 
-MetricTable::MetricTable(SqliteDatabase& database) {
+MetricTable::MetricTable(SqliteDatabase& database, std::int64_t floor) {
   database.addRows("new_metric", 4, *this);
-  insertRows_ = database.prepare(
-      "INSERT INTO metric (posted_at, identifier, record, user_id) SELECT c0, c1, c2, c3 FROM new_metric");
+  const std::string columns = "posted_at, identifier, record, user_id";
+  const std::string values = "c0, c1, c2, c3 FROM new_metric";
+  insertRows_ = database.prepare("INSERT INTO metric (" + columns + ") SELECT " + values);
+  if (floor == 0) return;
+  insertAboveFloor_ = database.prepare("INSERT INTO metric (id, " + columns + ") SELECT " +
+                                       std::to_string(floor) + " + row_number() OVER (), " + values);
 }
 
 bool MetricTable::insert(const StoreBatch& batch) {
   if (batch.metrics().empty()) return true;
   batch_ = &batch;
-  const bool inserted = insertRows_.run();
+  const bool inserted = (insertAboveFloor_ ? insertAboveFloor_ : insertRows_).run();
+  insertAboveFloor_ = {};
   batch_ = nullptr;
   return inserted;
 }

@@ -1,19 +1,25 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/store/PowerTable.h"
 
+#include <string>
+
 namespace tonewerk {
 
-PowerTable::PowerTable(SqliteDatabase& database) {
+PowerTable::PowerTable(SqliteDatabase& database, std::int64_t floor) {
   database.addRows("new_power_event", 5, *this);
-  insertRows_ = database.prepare(
-      "INSERT INTO power_event (recorded_at, event_group, name, payload, user_id)"
-      " SELECT c0, c1, c2, c3, c4 FROM new_power_event");
+  const std::string columns = "recorded_at, event_group, name, payload, user_id";
+  const std::string values = "c0, c1, c2, c3, c4 FROM new_power_event";
+  insertRows_ = database.prepare("INSERT INTO power_event (" + columns + ") SELECT " + values);
+  if (floor == 0) return;
+  insertAboveFloor_ = database.prepare("INSERT INTO power_event (id, " + columns + ") SELECT " +
+                                       std::to_string(floor) + " + row_number() OVER (), " + values);
 }
 
 bool PowerTable::insert(const StoreBatch& batch) {
   if (batch.power().empty()) return true;
   batch_ = &batch;
-  const bool inserted = insertRows_.run();
+  const bool inserted = (insertAboveFloor_ ? insertAboveFloor_ : insertRows_).run();
+  insertAboveFloor_ = {};
   batch_ = nullptr;
   return inserted;
 }

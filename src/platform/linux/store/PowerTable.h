@@ -1,6 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <cstdint>
+
 #include "platform/linux/store/SqliteDatabase.h"
 #include "platform/linux/store/SqliteRows.h"
 #include "platform/linux/store/StoreBatch.h"
@@ -10,8 +12,9 @@ namespace tonewerk {
 // Writes the power events into an open report store. Used on the writer's thread, within its transactions.
 class PowerTable final : private SqliteRows {
  public:
-  // `database` outlives it. Prepares its statement. Whether that succeeded shows in the first insert().
-  explicit PowerTable(SqliteDatabase& database);
+  // `database` outlives it. The first row is numbered above `floor`. Prepares its statements. Whether that
+  // succeeded shows in the first insert(). After a transaction was undone, a new object is needed.
+  PowerTable(SqliteDatabase& database, std::int64_t floor);
 
   // Inserts the batch's power events. False on failure. The database then has the problem.
   [[nodiscard]] bool insert(const StoreBatch& batch);
@@ -21,6 +24,7 @@ class PowerTable final : private SqliteRows {
   void read(std::size_t row, int column, SqliteCell& cell) const override;
 
   SqliteStatement insertRows_;
+  SqliteStatement insertAboveFloor_;   // the first rows, if there is a floor
   const StoreBatch* batch_ = nullptr;  // while its rows are inserted
 };
 

@@ -7,12 +7,15 @@
 
 namespace tonewerk {
 
-RtcTable::RtcTable(SqliteDatabase& database, const JsonService& json, std::uint64_t fileNumber)
+RtcTable::RtcTable(SqliteDatabase& database, const JsonService& json, std::uint64_t fileNumber,
+                   std::int64_t floor)
     : database_(database),
       json_(json),
       fileNumber_(fileNumber),
-      insertSession_(database.prepare(
-          "INSERT INTO rtc_session (started_at, session_info, user_info, user_id) VALUES (?1, ?2, ?3, ?4)")) {
+      floor_(floor),
+      insertSession_(
+          database.prepare("INSERT INTO rtc_session (id, started_at, session_info, user_info, user_id)"
+                           " VALUES (?5, ?1, ?2, ?3, ?4)")) {
   database.addRows("new_rtc_row", 7, *this);
   insertMessages_ = database.prepare(
       "INSERT INTO rtc_row (id, sent_at, rtc_session, category, type, payload, user_id)"
@@ -78,7 +81,13 @@ bool RtcTable::insertSession(const std::shared_ptr<RtcSessionRecord>& session, s
   } else {
     insertSession_.bind(4, static_cast<std::int64_t>(user));
   }
+  if (floor_ == 0) {
+    insertSession_.bindNull(5);
+  } else {
+    insertSession_.bind(5, floor_ + 1);
+  }
   if (!insertSession_.run()) return false;
+  floor_ = 0;
   const auto identifier = database_.number("SELECT last_insert_rowid()");
   if (!identifier) return false;
   session->place = {*identifier, fileNumber_};

@@ -22,8 +22,10 @@ class JsonService;
 class RtcTable final : private SqliteRows {
  public:
   // `database` and `json` outlive it. `fileNumber` distinguishes this file from those that the process wrote
-  // before. Prepares its statements. Whether that succeeded shows in the first insert().
-  RtcTable(SqliteDatabase& database, const JsonService& json, std::uint64_t fileNumber);
+  // before. The first session is numbered above `floor`. Prepares its statements. Whether that succeeded
+  // shows in the first insert().
+  RtcTable(SqliteDatabase& database, const JsonService& json, std::uint64_t fileNumber,
+           std::int64_t floor = 0);
   RtcTable(const RtcTable&) = delete;
   RtcTable& operator=(const RtcTable&) = delete;
   // Takes back the place of sessions that were not committed.
@@ -52,6 +54,7 @@ class RtcTable final : private SqliteRows {
   SqliteDatabase& database_;
   const JsonService& json_;
   const std::uint64_t fileNumber_;
+  std::int64_t floor_;  // 0 when the rows in the table say it
   SqliteStatement insertSession_;
   SqliteStatement insertMessages_;
   const StoreBatch* batch_ = nullptr;          // while its messages are inserted

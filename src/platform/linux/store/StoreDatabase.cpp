@@ -8,6 +8,7 @@
 #include <system_error>
 #include <utility>
 
+#include "platform/linux/store/StoreFloors.h"
 #include "platform/linux/store/StoreSchema.h"
 #include "platform/linux/store/StoreViews.h"
 
@@ -109,12 +110,14 @@ StoreDatabase::Result StoreDatabase::open() {
   applyBounds();
   begin_ = database_.prepare("BEGIN IMMEDIATE");
   commit_ = database_.prepare("COMMIT");
-  numbering_.emplace(database_);
+  const std::optional<StoreRowIds> floors = readStoreFloors(database_);
+  if (!floors) return fail();
+  numbering_.emplace(database_, *floors);
   analytics_.emplace(database_);
-  metrics_.emplace(database_);
-  power_.emplace(database_);
-  rtc_.emplace(database_, json_, fileNumber_);
-  lives_.emplace(database_, fileNumber_, 0);
+  metrics_.emplace(database_, (*floors)[storeTableIndex("metric")]);
+  power_.emplace(database_, (*floors)[storeTableIndex("power_event")]);
+  rtc_.emplace(database_, json_, fileNumber_, (*floors)[storeTableIndex("rtc_session")]);
+  lives_.emplace(database_, fileNumber_, (*floors)[storeTableIndex("session_row")]);
   marks_.emplace(database_);
   trimmer_.emplace(database_, holdings_, clock_);
   if (!ensureStoreViews(database_)) return fail();

@@ -13,8 +13,8 @@ bool StoreNumbering::readNewest() {
   if (!event) return false;
   const auto message = database_.number("SELECT coalesce(max(id), 0) FROM rtc_row");
   if (!message) return false;
-  newestEvent_ = *event;
-  newestMessage_ = std::max(*event, *message);
+  newestEvent_ = std::max(*event, floors_[storeTableIndex("analytics_row")]);
+  newestMessage_ = std::max({newestEvent_, *message, floors_[storeTableIndex("rtc_row")]});
   hasRead_ = true;
   return true;
 }

@@ -7,6 +7,7 @@
 
 #include "platform/linux/store/SqliteDatabase.h"
 #include "platform/linux/store/StoreBatch.h"
+#include "platform/linux/store/StoreSchema.h"
 
 namespace tonewerk {
 
@@ -18,8 +19,9 @@ namespace tonewerk {
 // needed.
 class StoreNumbering {
  public:
-  // `database` outlives it.
-  explicit StoreNumbering(SqliteDatabase& database) : database_(database) {}
+  // `database` outlives it. All identifiers are above those of `floors` (StoreFloors.h).
+  StoreNumbering(SqliteDatabase& database, const StoreRowIds& floors)
+      : database_(database), floors_(floors) {}
 
   // Numbers the rows of `batch`. The first call reads the newest identifiers of the file. False on failure.
   // The database then has the problem.
@@ -35,6 +37,7 @@ class StoreNumbering {
   [[nodiscard]] bool readNewest();
 
   SqliteDatabase& database_;
+  const StoreRowIds floors_;
   SqliteStatement newestInTable_;
   bool hasRead_ = false;
   std::int64_t newestEvent_ = 0;

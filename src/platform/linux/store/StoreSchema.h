@@ -60,6 +60,13 @@ static_assert(kStoreSessionBytes == 128 && kStoreTables.back().bytes == "128", "
 // An identifier for each of kStoreTables.
 using StoreRowIds = std::array<std::int64_t, kStoreTables.size()>;
 
+// The place of a table in kStoreTables.
+consteval std::size_t storeTableIndex(std::string_view name) {
+  std::size_t at = 0;
+  while (kStoreTables[at].name != name) ++at;
+  return at;
+}
+
 // What a row counts beside its `bytes`: about the bytes of its identifier and its other columns.
 inline constexpr std::int64_t kStoreRowBytes = 32;
 
