@@ -202,13 +202,15 @@ StoreDatabase::Result ReportStore::writeOrBeginAnew() {
   const StoreDatabase::Result result = database_.write(batch_);
   logJump();
   if (result != StoreDatabase::Result::kCorrupt) return result;
-  return moveAside() ? database_.write(batch_) : StoreDatabase::Result::kFailed;
+  return beginAnew() ? database_.write(batch_) : StoreDatabase::Result::kFailed;
 }
 
-bool ReportStore::moveAside() {
-  errorLog(log_, "%s is damaged (%s); it is moved aside and a new one begun", database_.path(),
-           database_.problem());
-  return database_.moveAside();
+bool ReportStore::beginAnew() {
+  const std::string damage = database_.problem();
+  if (!database_.beginAnew()) return false;  // the caller logs the problem
+  errorLog(log_, "%s is damaged (%s); it is moved aside and a new one begun; rows saved of it: %lli",
+           database_.path(), damage, database_.salvagedRows());
+  return true;
 }
 
 void ReportStore::trim() {
@@ -223,7 +225,7 @@ void ReportStore::trim() {
     return;
   }
   moreToTrim_ = false;
-  if (result == StoreDatabase::Result::kCorrupt && moveAside()) return;
+  if (result == StoreDatabase::Result::kCorrupt && beginAnew()) return;
   if (loggedTrimProblem_ == database_.problem()) return;
   loggedTrimProblem_ = database_.problem();
   errorLog(log_, "cannot keep %s within its bounds: %s", database_.path(), loggedTrimProblem_);

@@ -34,7 +34,7 @@ class PreferenceStore;
 // queue is full because more is recorded than the disk takes, recording waits. When the file cannot be
 // written (a full disk, a missing directory) or the disk hangs, recording does not
 // wait: rows are kept while there is room and then dropped. Their number is logged when writing succeeds
-// again, and at the end. A damaged file is moved aside.
+// again, and at the end. A damaged file is moved aside, and its rows are saved as far as they can be read.
 //
 // A row belongs to the user for whom the recording thread works (WorkingFor). The user's account is charged
 // for the row's place in the queue (StoreQueue), and for its bytes in the file. When the file is at its
@@ -75,8 +75,9 @@ class ReportStore {
   // Also while the journal is played: a life that the file has already is known again.
   void record(const LifeRow& row);
 
-  // Before anything is recorded: the marks in the file. Waits for the store's thread to open the file.
-  // What fails is tried again for a fifth of a second. None on failure, which is logged.
+  // Before anything is recorded: the marks in the file. Waits for the store's thread to open the file, and to
+  // save the rows of a damaged one. What fails is tried again for a fifth of a second. None on failure, which
+  // is logged.
   [[nodiscard]] std::optional<StoreMarks> marks();
   // While the journal is played, rows are left out that are not after `marks`, and until endPlaying() rows of
   // no request, too. Like these, on the thread that plays, while no other thread records.
@@ -126,7 +127,7 @@ class ReportStore {
   [[nodiscard]] bool writeUntilDone();
   [[nodiscard]] bool write();
   [[nodiscard]] StoreDatabase::Result writeOrBeginAnew();
-  [[nodiscard]] bool moveAside();
+  [[nodiscard]] bool beginAnew();
   void trim();
   void chargeStored();
   void readBounds();

@@ -42,6 +42,10 @@ void SqliteStatement::bindBytes(int parameter, std::string_view bytes) {
 
 void SqliteStatement::bindNull(int parameter) { sqlite3_bind_null(statement_, parameter); }
 
+void SqliteStatement::bindColumn(int parameter, const SqliteStatement& row, int column) {
+  sqlite3_bind_value(statement_, parameter, sqlite3_column_value(row.statement_, column));
+}
+
 SqliteStatement::Step SqliteStatement::step() {
   switch (sqlite3_step(statement_)) {
     case SQLITE_ROW:
@@ -88,6 +92,10 @@ std::string SqliteStatement::bytes(int column) const {
 
 bool SqliteStatement::isNull(int column) const {
   return sqlite3_column_type(statement_, column) == SQLITE_NULL;
+}
+
+bool SqliteStatement::isValid(int column) const {
+  return sqlite3_column_type(statement_, column) != SQLITE_TEXT || text(column) == bytes(column);
 }
 
 namespace {

@@ -37,6 +37,8 @@ class SqliteStatement {
   // Not copied either.
   void bindBytes(int parameter, std::string_view bytes);
   void bindNull(int parameter);
+  // A value of another statement's current row, of any type. It is copied.
+  void bindColumn(int parameter, const SqliteStatement& row, int column);
 
   [[nodiscard]] Step step();
   // Prepares for the next use. The parameters keep their values.
@@ -54,6 +56,8 @@ class SqliteStatement {
   std::string text(int column) const;
   std::string bytes(int column) const;
   bool isNull(int column) const;
+  // Whether it is anything but a text that is no UTF-8.
+  bool isValid(int column) const;
 
  private:
   sqlite3_stmt* statement_ = nullptr;

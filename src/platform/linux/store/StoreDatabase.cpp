@@ -4,11 +4,14 @@
 #include <chrono>
 #include <cstdint>
 #include <filesystem>
+#include <string_view>
 #include <sys/stat.h>
 #include <system_error>
 #include <utility>
 
+#include "platform/Clock.h"
 #include "platform/linux/store/StoreFloors.h"
+#include "platform/linux/store/StoreSalvage.h"
 #include "platform/linux/store/StoreSchema.h"
 #include "platform/linux/store/StoreViews.h"
 
@@ -17,6 +20,11 @@ namespace {
 
 // How long a statement waits for another writer's lock. Readers take none.
 constexpr std::chrono::milliseconds kPatience{500};
+// What is being saved of a damaged file.
+constexpr std::string_view kSalvaging = ".salvaging";
+// What was saved of it, complete, until it takes its place.
+constexpr std::string_view kSalvaged = ".salvaged";
+constexpr std::string_view kAside = ".corrupt";
 
 }  // namespace
 
@@ -71,22 +79,65 @@ StoreDatabase::Result StoreDatabase::trimSize(bool& moreToDo) {
   return resultOf(trimmer_->trimSize(bounds_), moreToDo);
 }
 
-bool StoreDatabase::moveAside() {
+bool StoreDatabase::beginAnew() {
+  const std::string damage = problem_;
   close();
   holdings_.forget();
-  // The write-ahead log is renamed first: a new database must not find it, or its pages would overwrite the
-  // new ones.
-  for (const char* suffix : {"-wal", "-shm", ""}) {
-    const std::filesystem::path aside = path_ + ".corrupt" + suffix;
+  if (!saveRows(damage)) return false;
+  ++fileNumber_;  // sessions may be lost
+  return takeSalvaged();
+}
+
+bool StoreDatabase::saveRows(const std::string& damage) {
+  const std::chrono::nanoseconds now = clock_.monotonic();
+  if (nextSalvage_ && now < *nextSalvage_) {
+    problem_ = salvageProblem_;
+    return false;
+  }
+  removeSalvaging();
+  const StoreSalvage salvage(path_, path_ + std::string(kSalvaging));
+  salvagedRows_ = salvage.rows();
+  nextSalvage_.reset();
+  if (salvage.problem().empty()) return endSalvage();
+  removeSalvaging();
+  nextSalvage_ = now + kSalvageInterval;
+  salvageProblem_ = "it is damaged (" + damage + "), and its rows cannot be saved: " + salvage.problem();
+  problem_ = salvageProblem_;
+  return false;
+}
+
+void StoreDatabase::removeSalvaging() {
+  for (const char* suffix : {"-journal", "-wal", "-shm", ""}) {
     std::error_code error;
-    std::filesystem::remove(aside, error);
-    std::filesystem::rename(path_ + suffix, aside, error);
+    std::filesystem::remove(path_ + std::string(kSalvaging) + suffix, error);
+  }
+}
+
+bool StoreDatabase::endSalvage() {
+  std::error_code error;
+  for (const char* suffix : {"-wal", "-shm", ""}) {
+    std::filesystem::remove(path_ + std::string(kAside) + suffix, error);
+  }
+  std::filesystem::rename(path_ + std::string(kSalvaging), path_ + std::string(kSalvaged), error);
+  if (error) problem_ = "what was saved of it cannot be renamed: " + error.message();
+  return !error;
+}
+
+// From here on the process may end between any two steps, and the next start goes on with them.
+bool StoreDatabase::takeSalvaged() {
+  std::error_code error;
+  if (!std::filesystem::exists(path_ + std::string(kSalvaged), error)) return true;
+  // The saved file must not find the damaged one's log, or the log's pages would overwrite its own.
+  for (const char* suffix : {"-wal", "-shm", ""}) {
+    std::filesystem::rename(path_ + suffix, path_ + std::string(kAside) + suffix, error);
     if (error && error != std::errc::no_such_file_or_directory) {
-      problem_ = error.message();
+      problem_ = "it is damaged and cannot be moved aside: " + error.message();
       return false;
     }
   }
-  return true;
+  std::filesystem::rename(path_ + std::string(kSalvaged), path_, error);
+  if (error) problem_ = "what was saved of it cannot be put in place: " + error.message();
+  return !error;
 }
 
 StoreDatabase::Result StoreDatabase::open() {
@@ -94,6 +145,8 @@ StoreDatabase::Result StoreDatabase::open() {
   std::error_code error;
   std::filesystem::create_directories(directory_, error);
   if (error) return failWith(error.message());
+  removeSalvaging();
+  if (!takeSalvaged()) return Result::kFailed;
   if (!database_.open(path_, SqliteDatabase::Mode::kReadWrite, kPatience)) return fail();
   const auto version = database_.number("PRAGMA user_version");
   if (!version) return fail();
@@ -141,12 +194,7 @@ bool StoreDatabase::recognizeFile() {
 bool StoreDatabase::prepareFile() {
   ++fileNumber_;
   holdings_.forget();  // it may have the number of a file that was removed
-  // These settings come before anything else is in the file; later they would take effect only when the whole
-  // file is rewritten. Pages of 8 KiB are cheaper to fill than smaller ones, and a commit of a single message
-  // still writes one page only.
-  return database_.run(
-             "PRAGMA page_size = 8192; PRAGMA auto_vacuum = INCREMENTAL; PRAGMA journal_mode = WAL;") &&
-         database_.run(storeSchema());
+  return database_.run(storeFileSettings() + "PRAGMA journal_mode = WAL") && database_.run(storeSchema());
 }
 
 bool StoreDatabase::migrate(std::int64_t version) {

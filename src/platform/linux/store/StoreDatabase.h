@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <chrono>
 #include <cstdint>
 #include <optional>
 #include <string>
@@ -37,6 +38,9 @@ class StoreDatabase {
     kCorrupt,  // the file is damaged or is no database
   };
 
+  // Copying a large file again and again would wear the disk out.
+  static constexpr std::chrono::minutes kSalvageInterval{5};
+
   // The file is in `directory`, which is made when it is missing. `json` and `clock` outlive it.
   StoreDatabase(std::string directory, const JsonService& json, const Clock& clock);
 
@@ -54,9 +58,13 @@ class StoreDatabase {
   std::int64_t bytesOf(std::uint32_t user) const { return holdings_.of(user); }
   // By how many seconds the wall clock has jumped since the last call; mostly 0.
   double takeJump() { return age_.takeJump(); }
-  // Renames the file and its side files to "<path>.corrupt...", and replaces those of an earlier time. On
-  // failure it is false, and problem() describes it.
-  [[nodiscard]] bool moveAside();
+  // After kCorrupt: begins a new file with the rows that can be read, and renames the damaged one and its
+  // side files to "<path>.corrupt...", replacing those of an earlier time. On failure it is false, problem()
+  // describes it, and the damaged file stays in place. When there was no room for the rows, they are copied
+  // again by the first call after kSalvageInterval.
+  [[nodiscard]] bool beginAnew();
+  // How many rows the last beginAnew() has saved.
+  std::int64_t salvagedRows() const { return salvagedRows_; }
 
   // Any thread.
   const std::string& path() const { return path_; }
@@ -68,6 +76,12 @@ class StoreDatabase {
  private:
   [[nodiscard]] Result open();
   [[nodiscard]] bool prepareFile();
+  [[nodiscard]] bool saveRows(const std::string& damage);
+  void removeSalvaging();
+  // From here on what was saved takes the place of the damaged file, now or at the next start.
+  [[nodiscard]] bool endSalvage();
+  // If there is something that was saved: moves the damaged file aside and puts it in place.
+  [[nodiscard]] bool takeSalvaged();
   // A file of an earlier version becomes one of this version.
   [[nodiscard]] bool migrate(std::int64_t version);
   [[nodiscard]] bool insert(const StoreBatch& batch);
@@ -106,6 +120,9 @@ class StoreDatabase {
   dev_t device_ = 0;
   ino_t inode_ = 0;
   StoreBounds bounds_;
+  std::int64_t salvagedRows_ = 0;
+  std::optional<std::chrono::nanoseconds> nextSalvage_;  // after one that had no room
+  std::string salvageProblem_;
   std::string problem_;
 };
 

@@ -116,6 +116,10 @@ std::string inTransaction(const std::string& sql) {
 
 }  // namespace
 
+// Pages of 8 KiB are cheaper to fill than smaller ones, and a commit of a single message still writes one
+// page only.
+std::string storeFileSettings() { return "PRAGMA page_size = 8192; PRAGMA auto_vacuum = INCREMENTAL;"; }
+
 std::string storeSchema() {
   std::string sql(kTables);
   sql += kSessionTable;

@@ -70,6 +70,10 @@ consteval std::size_t storeTableIndex(std::string_view name) {
 // What a row counts beside its `bytes`: about the bytes of its identifier and its other columns.
 inline constexpr std::int64_t kStoreRowBytes = 32;
 
+// The settings of a new file. They come before anything else is in it; later they would take effect only when
+// the whole file is rewritten.
+std::string storeFileSettings();
+
 // The SQL that makes the schema in an empty database, user_version included, in one transaction.
 std::string storeSchema();
 
