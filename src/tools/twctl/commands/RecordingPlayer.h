@@ -7,8 +7,8 @@
 #include <string>
 #include <system_error>
 
+#include "tools/recording/Recording.h"
 #include "tools/twctl/DaemonConnection.h"
-#include "tools/twctl/input/Recording.h"
 
 namespace tonewerk {
 

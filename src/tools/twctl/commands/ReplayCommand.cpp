@@ -9,10 +9,10 @@
 #include <system_error>
 
 #include "protocol/Requests.h"
+#include "tools/recording/Recording.h"
 #include "tools/twctl/DaemonCalls.h"
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/commands/RecordingPlayer.h"
-#include "tools/twctl/input/Recording.h"
 #include "tools/twctl/input/ValueArguments.h"
 #include "tools/twctl/show/Table.h"
 

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "tools/twctl/input/JsonArguments.h"
+#include "tools/recording/JsonArguments.h"
 
 #include <nlohmann/json.hpp>
 #include <optional>

@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "tools/twctl/input/Recording.h"
+#include "tools/recording/Recording.h"
 
 #include <gmock/gmock.h>
 #include <sstream>

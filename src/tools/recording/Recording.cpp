@@ -1,11 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "tools/twctl/input/Recording.h"
+#include "tools/recording/Recording.h"
 
 #include <istream>
 #include <utility>
 
 #include "platform/JsonService.h"
-#include "tools/twctl/input/JsonArguments.h"
+#include "tools/recording/JsonArguments.h"
 
 namespace tonewerk {
 namespace {
