@@ -11,6 +11,10 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
+// No request holds values that nest deeper. The library writes values recursively, so a line that is deep
+// enough would exhaust the stack.
+constexpr int kMaxDepth = 200;
+
 // Values cannot be null, so the array of arguments is read here. The service reads the values themselves, by
 // the same rules as the daemon.
 std::optional<Value> valueOf(const Json& json, const JsonService& service, std::string& problem) {
@@ -32,10 +36,10 @@ std::string takeArguments(const Json& array, const JsonService& service, Argumen
 }
 
 std::string take(const Json& object, std::string_view parameters, const JsonService& service,
-                 ValueMap& members, Arguments& arguments) {
+                 ValueMap& members, Arguments& arguments, bool& hasParameters) {
   const auto array = object.find(std::string(parameters));
-  if (array == object.end() || !array->is_array())
-    return "\"" + std::string(parameters) + "\" must be an array";
+  hasParameters = array != object.end();
+  if (hasParameters && !array->is_array()) return "\"" + std::string(parameters) + "\" must be an array";
   for (const auto& [key, member] : object.items()) {
     if (key == parameters) continue;
     std::string problem;
@@ -43,17 +47,22 @@ std::string take(const Json& object, std::string_view parameters, const JsonServ
     if (!value) return Value(key).text() + ": " + problem;
     members.set(key, std::move(*value));
   }
-  return takeArguments(*array, service, arguments);
+  return hasParameters ? takeArguments(*array, service, arguments) : std::string();
 }
 
 }  // namespace
 
 std::string parseJsonCall(std::string_view line, std::string_view parameters, const JsonService& json,
-                          ValueMap& members, Arguments& arguments) {
+                          ValueMap& members, Arguments& arguments, bool& hasParameters) {
   try {
-    const Json object = Json::parse(line);
+    bool isTooDeep = false;
+    const Json object = Json::parse(line, [&](int depth, Json::parse_event_t /*event*/, Json& /*value*/) {
+      isTooDeep = isTooDeep || depth > kMaxDepth;
+      return !isTooDeep;
+    });
+    if (isTooDeep) return "values are nested deeper than " + std::to_string(kMaxDepth);
     if (!object.is_object()) return "not a JSON object";
-    return take(object, parameters, json, members, arguments);
+    return take(object, parameters, json, members, arguments, hasParameters);
   } catch (const Json::exception& exception) {
     return exception.what();
   }

@@ -319,6 +319,34 @@ TEST_F(CommandLineTest, PlaysARecordingWithoutWaitingForAStart) {
   EXPECT_GT(numberOf(time), 1.7e9);
 }
 
+TEST_F(CommandLineTest, PlaysEachClientOfARecordingOnAConnectionOfItsOwn) {
+  daemon().refuse("stopReportingSessionForID", messagingError(kOverLimit, "too much"));
+  const std::string file = write("recording.jsonl", R"({"device": {"starts_at": 1763633880}}
+{"at": 0, "client": 2, "connect": {"user": 1001, "process": "player"}}
+{"at": 0, "client": 2, "call": "createReportingSession", "params": [7]}
+{"at": 0, "client": 2, "call": "startReportingSessionForID", "params": [7]}
+{"at": 0, "client": 3, "call": "createReportingSession", "params": [8]}
+{"at": 0, "client": 2, "call": "stopReportingSessionForID", "params": [7]}
+{"at": 0, "client": 2, "disconnect": true}
+{"at": 0, "client": 2, "call": "createReportingSession", "params": [9]}
+)");
+  EXPECT_EQ(run({"replay", file}), kRefused);
+  EXPECT_THAT(errors(), HasSubstr("line 6: stopReportingSessionForID: too much"));
+  EXPECT_THAT(daemon().requests(), SizeIs(5));
+  EXPECT_EQ(daemon().connections(), 3U);
+}
+
+TEST_F(CommandLineTest, ConnectsAgainWhereTheDaemonOfARecordingBeginsAgain) {
+  daemon();
+  const std::string file =
+      write("recording.jsonl", R"({"at": 0, "client": 2, "call": "createReportingSession", "params": [7]}
+{"at": 0, "client": 3, "call": "createReportingSession", "params": [8]}
+{"at": 0, "restart": true}
+{"at": 0, "client": 2, "call": "createReportingSession", "params": [7]}
+)");
+  EXPECT_EQ(run({"replay", file}), kDone) << errors();
+  EXPECT_EQ(daemon().connections(), 3U);
+}
 TEST_F(CommandLineTest, PlaysWithoutPauses) {
   daemon();
   std::string text;

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <cstddef>
 #include <cstdint>
 #include <map>
 #include <memory>
@@ -59,6 +60,11 @@ class ScriptedDaemon {
     std::erase_if(found, [&](const Request& request) { return request.method != method; });
     return found;
   }
+  // How many connections there have been.
+  std::size_t connections() const {
+    const MutexLock lock(mutex_);
+    return connections_;
+  }
 
  private:
   class Object final : public RequestHandler {
@@ -77,6 +83,7 @@ class ScriptedDaemon {
    public:
     explicit Delegate(ScriptedDaemon& daemon) : daemon_(daemon) {}
     bool listenerShouldAcceptNewConnection(MessagingConnection& connection) override {
+      daemon_.countConnection();
       connection.setRequestHandler(requests::all(), std::make_shared<Object>(daemon_));
       connection.resume();
       return true;
@@ -99,6 +106,11 @@ class ScriptedDaemon {
       while (!ends_) ending_.wait(lock);
     }
     listener_->shutDown();
+  }
+
+  void countConnection() {
+    const MutexLock lock(mutex_);
+    ++connections_;
   }
 
   void handle(const std::string& method, Arguments arguments, const Reply& reply) {
@@ -128,6 +140,7 @@ class ScriptedDaemon {
   mutable Mutex mutex_;
   Condition ending_;
   std::vector<Request> requests_ GUARDED_BY(mutex_);
+  std::size_t connections_ GUARDED_BY(mutex_) = 0;
   bool ends_ GUARDED_BY(mutex_) = false;
 
   Delegate delegate_{*this};

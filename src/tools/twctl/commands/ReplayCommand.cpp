@@ -1,15 +1,15 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <CLI/CLI.hpp>
-#include <cerrno>
 #include <cmath>
-#include <fstream>
 #include <limits>
 #include <memory>
+#include <optional>
 #include <string>
 #include <system_error>
+#include <utility>
 
 #include "protocol/Requests.h"
-#include "tools/recording/Recording.h"
+#include "tools/recording/RecordingFile.h"
 #include "tools/twctl/DaemonCalls.h"
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/commands/RecordingPlayer.h"
@@ -33,54 +33,48 @@ std::optional<double> speedOf(const std::string& text) {
   return value.number();
 }
 
-std::optional<Recording> readRecording(Tool& tool, const std::string& file) {
-  std::string problem;
-  errno = 0;
-  std::ifstream text(file);
-  std::optional<Recording> recording;
-  if (text) recording = Recording::read(text, requests::all(), tool.json, problem);
-  // A directory can be opened, but reading it fails.
-  if (!text.is_open() || text.bad()) {
-    const int reason = errno != 0 ? errno : EIO;
-    tool.status = tool.fail(kWrongUsage, file + ": " + std::generic_category().message(reason));
-    return std::nullopt;
-  }
-  if (!recording) tool.status = tool.fail(kWrongUsage, file + ": " + problem);
-  return recording;
-}
-
 void replay(Tool& tool, const ReplayOptions& options) {
   const auto speed = speedOf(options.speed);
   if (!speed) {
     tool.status = tool.fail(kWrongUsage, "--speed must be a number above 0 or max");
     return;
   }
-  const std::optional<Recording> recording = readRecording(tool, options.file);
-  DaemonCalls daemon(tool);
-  if (!recording || !daemon.connect(DaemonCalls::Role::kClient)) return;
+  std::string problem;
+  const std::optional<Recording> recording =
+      readRecordingFile(options.file, requests::all(), tool.json, problem);
+  if (!recording) {
+    tool.status = tool.fail(kWrongUsage, options.file + ": " + problem);
+    return;
+  }
 
-  RecordingPlayer player(daemon.client(), *speed, [&](const RecordedCall& call, const std::string& why) {
+  const auto connect = [&tool]() -> std::unique_ptr<DaemonCalls> {
+    auto daemon = std::make_unique<DaemonCalls>(tool);
+    return daemon->connect(DaemonCalls::Role::kClient) ? std::move(daemon) : nullptr;
+  };
+  RecordingPlayer player(connect, *speed, [&](const RecordedStep& call, const std::string& why) {
     tool.status = tool.fail(kRefused, options.file + ": line " + std::to_string(call.line) + ": " + why);
   });
   if (const std::error_code error = player.play(*recording)) {
+    if (error == std::errc::not_connected) return;  // the user has been told
     tool.status =
         tool.fail(kNoDaemon, error == std::errc::timed_out ? "the daemon does not answer"
                                                            : "the daemon is gone: " + error.message());
     return;
   }
   Table(tool.out, tool.asJson, {"requests", "refused"})
-      .add({Value(recording->calls().size()), Value(player.refused())});
+      .add({Value(recording->requests()), Value(player.refused())});
 }
 
 }  // namespace
 
 void addReplayCommand(CLI::App& app, Tool& tool) {
-  CLI::App& command =
-      addCommand(app, tool, "replay", "Plays a recording on one connection, which ends with it");
+  CLI::App& command = addCommand(app, tool, "replay", "Plays a recording on connections that end with it");
   command.footer(
       "A recording is JSON Lines:\n"
       "  {\"at\": seconds, \"call\": \"sendMessage\", \"params\": [{\"key\": value}, category, type, [ID] or "
       "null]}\n"
+      "Lines may also name a client, say when it connects and disconnects, describe the device, and say\n"
+      "that the daemon began again; see twctl(1).\n"
       "A value {\"now\": offset} is the time of sending plus so many seconds. Everything is checked before\n"
       "anything is played.");
   const auto options = std::make_shared<ReplayOptions>();
