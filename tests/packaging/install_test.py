@@ -75,7 +75,7 @@ class InstallTest(unittest.TestCase):
         self.assertIn("prefix=/usr\n", next(self.scratch.rglob("twreporting.pc")).read_text())
         unit = self.scratch / "usr/lib/systemd/system/twreportingd.service"
         self.assertIn("ExecStart=/usr/bin/twreportingd\n", unit.read_text())
-        for name in ["twctl", "tw-pipewire"]:
+        for name in ["twctl", "tw-replay", "tw-pipewire"]:
             self.assertNotRegex(run(["readelf", "-d", self.scratch / "usr/bin" / name]), r"\((RPATH|RUNPATH)\)")
 
 

@@ -3,6 +3,7 @@
 // Tests the command-line tool as a program, with a running daemon.
 #include <filesystem>
 #include <fstream>
+#include <map>
 #include <nlohmann/json.hpp>
 #include <sstream>
 #include <string>
@@ -18,6 +19,7 @@ namespace {
 using nlohmann::json;
 using ::testing::AllOf;
 using ::testing::ElementsAre;
+using ::testing::Eq;
 using ::testing::HasSubstr;
 using ::testing::IsEmpty;
 using ::testing::SizeIs;
@@ -260,6 +262,39 @@ TEST_F(TwctlTest, TheExamplesArePlayedAndRecorded) {
   EXPECT_EQ(run({"replay", "--speed", "max", example("no-session.jsonl")}), kDone) << errors;
   EXPECT_TRUE(waitForEvents("com.orvane.standalone.RouteChange.Generic", 1));
   EXPECT_TRUE(waitForEvents("com.orvane.standalone.HAL_Error.Error", 1));
+}
+
+// The names and values of what a store has recorded, without what differs between two runs: times, how long
+// something lasted, and what the machine was doing.
+std::vector<std::string> comparableEvents(const std::string& store) {
+  const RecordedEvents events(store);
+  std::map<std::string, std::size_t> counts;
+  std::vector<std::string> found;
+  for (const std::string& name : events.names()) {
+    if (name == "com.orvane.tonewerk.twreportingclientuptime") continue;
+    json payload = events.named(name).at(counts[name]++);
+    for (const char* key : {"twreporting_timestamp", "start_epoch_time", "stop_epoch_time", "play_seconds",
+                            "inputrunning_seconds", "load_avg_1_min", "load_avg_5_min", "load_avg_15_min",
+                            "vmInfo_phys_footprint_MiB"}) {
+      payload.erase(key);
+    }
+    found.push_back(name + " " + payload.dump());
+  }
+  return found;
+}
+
+TEST_F(TwctlTest, AReplayWithoutADaemonRecordsWhatADaemonRecords) {
+  const TemporaryDirectory directory;
+  const std::string store = directory.path("store.db");
+  ASSERT_EQ(run({"replay", "--speed", "max", example("every-sink.jsonl")}), kDone) << errors;
+  ASSERT_TRUE(waitForEvents("com.orvane.tonewerk.twreportingclientuptime", 1));
+  ASSERT_TRUE(waitForEvents("com.orvane.longformaudio.Input.Summary", 1));
+  EXPECT_EQ(run({"replay", "--offline", example("every-sink.jsonl"), "-o", store}), kDone) << errors;
+  EXPECT_THAT(output, HasSubstr("requests"));
+  EXPECT_THAT(comparableEvents(store),
+              AllOf(SizeIs(testing::Gt(20)), Eq(comparableEvents(daemon.storePath()))));
+  EXPECT_EQ(run({"replay", "--offline", example("every-sink.jsonl"), "-o", store}), kRefused);
+  EXPECT_THAT(errors, HasSubstr("it exists already"));
 }
 
 TEST_F(TwctlTest, TheGuidesRecordingMakesAVolumeSummary) {

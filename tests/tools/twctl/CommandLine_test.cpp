@@ -347,6 +347,21 @@ TEST_F(CommandLineTest, ConnectsAgainWhereTheDaemonOfARecordingBeginsAgain) {
   EXPECT_EQ(run({"replay", file}), kDone) << errors();
   EXPECT_EQ(daemon().connections(), 3U);
 }
+
+// The tests are in another directory than the programs.
+TEST_F(CommandLineTest, NamesTheProgramThatAReplayWithoutADaemonNeeds) {
+  EXPECT_EQ(run({"replay", "--offline", "recording.jsonl", "-o", "store.db"}), kRefused);
+  EXPECT_THAT(errors(), HasSubstr("/tw-replay: No such file"));
+}
+
+TEST_F(CommandLineTest, KnowsWhatAReplayWithoutADaemonNeeds) {
+  EXPECT_EQ(run({"replay", "--offline", "recording.jsonl"}), kWrongUsage);
+  EXPECT_THAT(errors(), HasSubstr("--output"));
+  EXPECT_EQ(run({"replay", "recording.jsonl", "-o", "store.db"}), kWrongUsage);
+  EXPECT_THAT(errors(), HasSubstr("--offline"));
+  EXPECT_EQ(run({"replay", "--offline", "recording.jsonl", "-o", "store.db", "--speed", "2"}), kWrongUsage);
+}
+
 TEST_F(CommandLineTest, PlaysWithoutPauses) {
   daemon();
   std::string text;

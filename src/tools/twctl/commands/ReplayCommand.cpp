@@ -1,12 +1,18 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <CLI/CLI.hpp>
+#include <cerrno>
 #include <cmath>
+#include <filesystem>
 #include <limits>
 #include <memory>
 #include <optional>
+#include <spawn.h>
 #include <string>
+#include <sys/wait.h>
 #include <system_error>
+#include <unistd.h>
 #include <utility>
+#include <vector>
 
 #include "protocol/Requests.h"
 #include "tools/recording/RecordingFile.h"
@@ -22,6 +28,8 @@ namespace {
 struct ReplayOptions {
   std::string file;
   std::string speed = "1";
+  bool isOffline = false;
+  std::string store;
 };
 
 // "max", or a number above 0.
@@ -31,6 +39,35 @@ std::optional<double> speedOf(const std::string& text) {
   if (value.asString() != nullptr || value.asBoolean() != nullptr || !(value.number() > 0.0))
     return std::nullopt;
   return value.number();
+}
+
+// The program that plays recordings to the core: it is in the directory of this one.
+std::string offlineProgram() {
+  std::error_code error;
+  const std::filesystem::path executable = std::filesystem::read_symlink("/proc/self/exe", error);
+  return executable.parent_path() / "tw-replay";
+}
+
+// Runs the program with this one's streams, and returns its exit status. A signal to the terminal's programs
+// reaches it, too.
+int replayOffline(Tool& tool, const ReplayOptions& options) {
+  std::vector<std::string> words{offlineProgram()};
+  if (tool.asJson) words.emplace_back("--json");
+  words.insert(words.end(), {options.file, options.store});
+  std::vector<char*> arguments;
+  arguments.reserve(words.size() + 1);
+  for (std::string& word : words) arguments.push_back(word.data());
+  arguments.push_back(nullptr);
+  tool.out.flush();
+  pid_t process = 0;
+  if (const int error = posix_spawn(&process, arguments[0], nullptr, nullptr, arguments.data(), environ)) {
+    return tool.fail(kRefused, words[0] + ": " + std::generic_category().message(error));
+  }
+  int status = 0;
+  while (waitpid(process, &status, 0) < 0 && errno == EINTR) {
+  }
+  if (WIFEXITED(status)) return WEXITSTATUS(status);
+  return tool.fail(kRefused, words[0] + " has ended unexpectedly");
 }
 
 void replay(Tool& tool, const ReplayOptions& options) {
@@ -81,7 +118,18 @@ void addReplayCommand(CLI::App& app, Tool& tool) {
   command.add_option("FILE", options->file, "The recording")->required();
   command.add_option("--speed", options->speed, "1 as recorded, 2 twice as fast, max without pauses")
       ->capture_default_str();
-  command.callback([&tool, options] { replay(tool, *options); });
+  CLI::Option* offline = command.add_flag("--offline", options->isOffline,
+                                          "To the core itself instead of a daemon, without pauses");
+  CLI::Option* store = command.add_option("-o,--output", options->store, "The store to make, with --offline");
+  store->type_name("STORE")->needs(offline);
+  offline->needs(store)->excludes("--speed");
+  command.callback([&tool, options] {
+    if (options->isOffline) {
+      tool.status = replayOffline(tool, *options);
+    } else {
+      replay(tool, *options);
+    }
+  });
 }
 
 }  // namespace tonewerk
