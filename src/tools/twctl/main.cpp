@@ -1,4 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
+#include <csignal>
 #include <iostream>
 #include <unistd.h>
 
@@ -6,6 +7,7 @@
 #include "tools/twctl/commands/Commands.h"
 
 int main(int argc, char** argv) {
+  std::signal(SIGXFSZ, SIG_IGN);  // writing past the file size limit then fails instead of ending the process
   const tonewerk::NlohmannJsonService json;
   tonewerk::Tool tool{std::cout, std::cerr, json};
   tool.outIsTerminal = isatty(STDOUT_FILENO) != 0;

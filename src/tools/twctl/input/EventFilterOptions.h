@@ -6,6 +6,7 @@
 #include <string>
 
 #include "platform/linux/store/StoreReader.h"
+#include "tools/twctl/input/TimeRangeOptions.h"
 
 namespace CLI {
 class App;
@@ -28,8 +29,7 @@ class EventFilterOptions {
 
  private:
   std::optional<std::string> name_;
-  std::optional<std::string> since_;
-  std::optional<std::string> until_;
+  TimeRangeOptions range_;
   std::optional<std::int64_t> limit_;
 };
 
