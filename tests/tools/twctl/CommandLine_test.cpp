@@ -31,8 +31,8 @@ using testing::StartsWith;
 
 TEST_F(CommandLineTest, HelpsWithEveryCommand) {
   for (const char* name :
-       {"list", "validate", "send", "replay", "top", "tail", "events", "metrics", "power", "rtc", "defaults",
-        "notify", "captures", "drafts", "whirlcaps", "channels", "paths", "kill"}) {
+       {"list", "validate", "send", "replay", "record", "top", "tail", "events", "metrics", "power", "rtc",
+        "defaults", "notify", "captures", "drafts", "whirlcaps", "channels", "paths", "kill"}) {
     EXPECT_EQ(run({name, "--help"}), kDone);
     EXPECT_THAT(output(), HasSubstr("--json")) << name;
     EXPECT_THAT(errors(), IsEmpty());

@@ -32,6 +32,7 @@ int runCommandLine(int argc, const char* const* argv, Tool& tool) {
   addValidateCommand(app, tool);
   addSendCommand(app, tool);
   addReplayCommand(app, tool);
+  addRecordCommand(app, tool);
   addTopCommand(app, tool);
   addTailCommand(app, tool);
   addEventsCommand(app, tool);

@@ -18,6 +18,7 @@ void addListCommand(CLI::App& app, Tool& tool);
 void addValidateCommand(CLI::App& app, Tool& tool);
 void addSendCommand(CLI::App& app, Tool& tool);
 void addReplayCommand(CLI::App& app, Tool& tool);
+void addRecordCommand(CLI::App& app, Tool& tool);
 void addTopCommand(CLI::App& app, Tool& tool);
 void addTailCommand(CLI::App& app, Tool& tool);
 void addEventsCommand(CLI::App& app, Tool& tool);
