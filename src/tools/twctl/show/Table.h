@@ -3,6 +3,7 @@
 
 #include <cstddef>
 #include <iosfwd>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -21,6 +22,11 @@ class Table {
   // Prints the rows that are not printed yet.
   ~Table();
 
+  // Makes lines for people no longer than `width` characters, before the first row. Columns that are too wide
+  // are cut, which "…" shows. Where they would have too little left, each row is printed as a block of
+  // "column  value" with whole values, and an empty line follows it.
+  void fit(std::size_t width) { width_ = width; }
+
   struct Cell {
     std::string text;  // for people
     std::string json;  // for programs, a JSON value
@@ -36,17 +42,27 @@ class Table {
   void print();
 
  private:
-  void printRow(const std::vector<std::string>& texts);
+  void printRow(const std::vector<std::string>& texts, const std::vector<std::size_t>& widths);
+  void printBlock(const std::vector<std::string>& texts);
+  // The widths that fit; none when the columns would have too little left.
+  std::optional<std::vector<std::size_t>> fittingWidths() const;
+  std::vector<std::size_t> limited(std::size_t limit) const;
 
   // Rows are printed in portions of this size, so that a long table needs little memory.
   static constexpr std::size_t kPortion = 500;
+  static constexpr std::size_t kPortionBytes = std::size_t{1} << 20;
+  // What a cut column keeps at least.
+  static constexpr std::size_t kNarrowest = 8;
 
   std::ostream& out_;
   const bool asJson_;
   const std::vector<std::string> columns_;
   std::vector<std::size_t> widths_;
   std::vector<std::vector<std::string>> rows_;
+  std::size_t rowBytes_ = 0;
+  std::optional<std::size_t> width_;
   bool headPrinted_ = false;
+  bool inBlocks_ = false;
 };
 
 }  // namespace tonewerk

@@ -16,6 +16,13 @@ constexpr char kClearBelow[] = "\x1b[J";
 
 }  // namespace
 
+std::optional<TerminalSize> terminalSizeOf(int descriptor) {
+  winsize size{};
+  if (::ioctl(descriptor, TIOCGWINSZ, &size) != 0 || size.ws_col == 0 || size.ws_row == 0)
+    return std::nullopt;
+  return TerminalSize{size.ws_col, size.ws_row};
+}
+
 struct Terminal::InputModes {
   termios modes{};
 };
@@ -43,11 +50,7 @@ Terminal::~Terminal() {
   if (before_ != nullptr) ::tcsetattr(inDescriptor_, TCSAFLUSH, &before_->modes);
 }
 
-TerminalSize Terminal::size() const {
-  winsize size{};
-  if (::ioctl(outDescriptor_, TIOCGWINSZ, &size) != 0 || size.ws_col == 0 || size.ws_row == 0) return {};
-  return {size.ws_col, size.ws_row};
-}
+TerminalSize Terminal::size() const { return terminalSizeOf(outDescriptor_).value_or(TerminalSize()); }
 
 // Writes over the previous page, so that the screen does not flicker. There is no line end after the last
 // line: if the page fills the screen, it would scroll the first line away.

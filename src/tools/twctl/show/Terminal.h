@@ -4,6 +4,7 @@
 #include <cstddef>
 #include <iosfwd>
 #include <memory>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -13,6 +14,9 @@ struct TerminalSize {
   std::size_t columns = 80;
   std::size_t rows = 24;
 };
+
+// None when the descriptor is no terminal, or does not know its size.
+std::optional<TerminalSize> terminalSizeOf(int descriptor);
 
 // Shows one page at a time on the terminal's alternate screen. The destructor restores the previous screen.
 // Keys arrive as they are pressed, also Ctrl-C, and are not echoed.

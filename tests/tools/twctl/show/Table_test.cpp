@@ -41,6 +41,72 @@ TEST(TableTest, PrintsTheHeadOnceHoweverManyPortions) {
   EXPECT_EQ(out.str(), "a     b\nlong  1\nx     2\n");
 }
 
+TEST(TableTest, CutsTheWidestColumnsToTheWidth) {
+  std::ostringstream out;
+  {
+    Table table(out, false, {"id", "application", "payload"});
+    table.fit(30);
+    table.add(
+        {Value(5), Value("com.example.player"), Value("\xC3\xA4\xC3\xA4\xC3\xA4\xC3\xA4 and much more")});
+    table.add({Value(6), Value("short"), Value("")});
+  }
+  EXPECT_EQ(out.str(),
+            "id  application   payload\n"
+            "5   com.example\u2026  \xC3\xA4\xC3\xA4\xC3\xA4\xC3\xA4 and mu\u2026\n"
+            "6   short         \n");
+}
+
+TEST(TableTest, DoesNotCutWhatFits) {
+  std::ostringstream out;
+  {
+    Table table(out, false, {"a", "b"});
+    table.fit(8);
+    table.add({Value("abc"), Value("def")});
+  }
+  EXPECT_EQ(out.str(), "a    b\nabc  def\n");
+}
+
+TEST(TableTest, PrintsARowAsABlockWhereItsColumnsWouldHaveTooLittle) {
+  std::ostringstream out;
+  {
+    Table table(out, false, {"id", "application", "payload"});
+    table.fit(20);
+    table.add({Value(5), Value("com.example.player"), Value("{\"key\":\"value\"}")});
+    table.print();
+    table.add({Value(6), Value(""), Value("x")});
+  }
+  EXPECT_EQ(out.str(),
+            "id           5\n"
+            "application  com.example.player\n"
+            "payload      {\"key\":\"value\"}\n"
+            "\n"
+            "id           6\n"
+            "application\n"
+            "payload      x\n"
+            "\n");
+}
+
+TEST(TableTest, StaysATableWhenLaterRowsAreWide) {
+  std::ostringstream out;
+  {
+    Table table(out, false, {"a", "b"});
+    table.fit(12);
+    table.add({Value(1), Value(2)});
+    table.print();
+    table.add({Value("0123456789"), Value("abcdefghij")});
+  }
+  EXPECT_EQ(out.str(), "a  b\n1  2\n0123456\u2026  abcdefg\u2026\n");
+}
+
+TEST(TableTest, PrintsLargeRowsBeforeThereAreMany) {
+  std::ostringstream out;
+  Table table(out, false, {"a"});
+  table.add({Value("small")});
+  EXPECT_EQ(out.str(), "");
+  table.add({Value(std::string(1 << 20, 'x'))});
+  EXPECT_EQ(out.str().size(), std::string("a\nsmall\n").size() + (1 << 20) + 1);
+}
+
 TEST(TableTest, PrintsNothingWithoutRows) {
   std::ostringstream out;
   { const Table table(out, false, {"a"}); }
