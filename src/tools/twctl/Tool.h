@@ -28,9 +28,10 @@ struct Tool {
   bool asJson = false;      // --json
   bool systemWide = false;  // --system
   bool outIsTerminal = false;
-  int inDescriptor = -1;   // the descriptor to read keys from; -1 for none
-  int outDescriptor = -1;  // the descriptor of `out`; -1 when it is not a file
-  int status = kDone;      // the exit status of the command that ran
+  std::istream* in = nullptr;  // standard input, for whole texts; null for none
+  int inDescriptor = -1;       // the descriptor to read keys from; -1 for none
+  int outDescriptor = -1;      // the descriptor of `out`; -1 when it is not a file
+  int status = kDone;          // the exit status of the command that ran
 
   // Prints "twctl: <problem>" and returns `failure`. Escapes what the problem repeats of other programs' and
   // users' words.

@@ -12,6 +12,7 @@ int main(int argc, char** argv) {
   tonewerk::Tool tool{std::cout, std::cerr, json};
   tool.outIsTerminal = isatty(STDOUT_FILENO) != 0;
   tool.outDescriptor = STDOUT_FILENO;
+  tool.in = &std::cin;
   if (isatty(STDIN_FILENO) != 0) tool.inDescriptor = STDIN_FILENO;
   return tonewerk::runCommandLine(argc, argv, tool);
 }

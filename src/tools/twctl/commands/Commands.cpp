@@ -24,7 +24,7 @@ int runCommandLine(int argc, const char* const* argv, Tool& tool) {
   app.set_version_flag("--version", std::string("twctl ") + TONEWERK_VERSION);
   app.footer(
       "Exit status: 0 done; 1 refused, not valid, not there, or output that cannot be written; 2 wrong\n"
-      "usage, a bad recording included; 3 no daemon answers.");
+      "usage, a wrong query or recording included; 3 no daemon answers.");
   app.require_subcommand(1);
   addCommonOptions(app, tool);
   addStatusCommand(app, tool);
@@ -39,6 +39,7 @@ int runCommandLine(int argc, const char* const* argv, Tool& tool) {
   addMetricsCommand(app, tool);
   addPowerCommand(app, tool);
   addRtcCommand(app, tool);
+  addSqlCommand(app, tool);
   addDefaultsCommand(app, tool);
   addNotifyCommand(app, tool);
   addDiagnosticsCommands(app, tool);
