@@ -7,6 +7,7 @@ import tempfile
 import unittest
 
 from programs import NAMES, PROGRAMS, SOURCE, help_pages, run
+from store_fixture import begin_of_last_hour, make_store
 
 SCRIPTS = SOURCE / "packaging/completion"
 
@@ -164,6 +165,13 @@ class CompletionTest(unittest.TestCase):
         driver = re.search(r'"driver": "([^"]+)"', example).group(1)
         offered = self.offers("twctl", "channels", "--driver", driver[0])
         self.assertEqual([name.replace("\\", "") for name in offered], [driver])
+
+    def test_offers_the_views_of_the_store(self):
+        self.assertEqual(self.offers("twctl", "export", ""), [])
+        (self.scratch / "tonewerk").mkdir()
+        make_store(self.scratch / "tonewerk/reports.db", begin_of_last_hour())
+        self.assertEqual(self.offers("twctl", "export", "channel_"), ["channel_bucket", "channel_state", "channel_value"])
+        self.assertEqual(self.offers("twctl", "export", "--format", ""), ["csv", "jsonl"])
 
     def test_each_program_has_a_file_of_its_name(self):
         self.assertEqual({path.name for path in SCRIPTS.iterdir()}, set(NAMES))

@@ -40,6 +40,7 @@ int runCommandLine(int argc, const char* const* argv, Tool& tool) {
   addPowerCommand(app, tool);
   addRtcCommand(app, tool);
   addSqlCommand(app, tool);
+  addExportCommand(app, tool);
   addDefaultsCommand(app, tool);
   addNotifyCommand(app, tool);
   addDiagnosticsCommands(app, tool);

@@ -26,6 +26,7 @@ void addMetricsCommand(CLI::App& app, Tool& tool);
 void addPowerCommand(CLI::App& app, Tool& tool);
 void addRtcCommand(CLI::App& app, Tool& tool);
 void addSqlCommand(CLI::App& app, Tool& tool);
+void addExportCommand(CLI::App& app, Tool& tool);
 void addDefaultsCommand(CLI::App& app, Tool& tool);
 void addNotifyCommand(CLI::App& app, Tool& tool);
 // Adds captures, drafts and whirlcaps.

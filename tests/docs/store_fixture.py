@@ -1,0 +1,103 @@
+# SPDX-License-Identifier: Apache-2.0
+"""Makes a store for the queries of the pages: tables with the names and columns of the store's views, and a few rows in each."""
+
+import re
+import sqlite3
+import time
+
+from programs import SOURCE
+
+COLUMNS = {
+    "session": "id INTEGER, reporter_id INTEGER, service TEXT, application TEXT, process TEXT, user_id INTEGER, started_at REAL,"
+    " ended_at REAL, ending TEXT, messages INTEGER, unique_messages INTEGER, redundant_messages INTEGER, active_seconds REAL,"
+    " overloads INTEGER",
+    "event": "id INTEGER, at REAL, session INTEGER, category TEXT, type TEXT, source TEXT, payload TEXT",
+    "volume_stretch": "id INTEGER, session INTEGER, service TEXT, application TEXT, started_at REAL, ended_at REAL, seconds REAL,"
+    " device TEXT, volume REAL, volume_bucket REAL, sample_rate INTEGER, channels INTEGER, format TEXT, ringer INTEGER,"
+    " spatial INTEGER",
+    "input_stretch": "id INTEGER, session INTEGER, service TEXT, application TEXT, started_at REAL, ended_at REAL, seconds REAL,"
+    " device TEXT, mode TEXT, input_port TEXT, vocoders TEXT",
+    "gather_stretch": "id INTEGER, session INTEGER, service TEXT, application TEXT, started_at REAL, ended_at REAL, seconds REAL,"
+    " device TEXT, sample_rate INTEGER, channels INTEGER, format TEXT",
+    "issue": "id INTEGER, at REAL, session INTEGER, service TEXT, application TEXT, kind TEXT, node TEXT, duration_seconds REAL,"
+    " buffer_frames INTEGER, io_cycle INTEGER",
+    "haptics": "id INTEGER, at REAL, application TEXT, name TEXT, seconds REAL, status INTEGER",
+    "channel_value": "session INTEGER, at REAL, driver TEXT, group_name TEXT, subgroup TEXT, name TEXT, unit TEXT, value INTEGER",
+    "channel_bucket": "session INTEGER, at REAL, driver TEXT, group_name TEXT, subgroup TEXT, name TEXT, unit TEXT, lower INTEGER,"
+    " upper INTEGER, hits INTEGER",
+    "channel_state": "session INTEGER, at REAL, driver TEXT, group_name TEXT, subgroup TEXT, name TEXT, state TEXT,"
+    " transitions INTEGER, residency INTEGER, duty_cycle REAL",
+}
+
+
+def schema_version():
+    text = (SOURCE / "src/platform/linux/store/StoreSchema.h").read_text()
+    return int(re.search(r"kStoreSchemaVersion = (\d+)", text).group(1))
+
+
+def rows(hour):
+    """The rows of each table, in the order of its columns. Everything is in the hour that begins at `hour`, but for the last
+    session and its stretch, which are ten days older."""
+    old = hour - 10 * 86400
+    player, phone = ("longformaudio", "com.example.player"), ("telephony", "com.example.phone")
+    return {
+        "session": [
+            (1, 77, *player, "player", 1000, old, old + 60, "stopped", 10, 8, 2, 60, 0),
+            (2, 77, *player, "player", 1000, hour, hour + 300, "stopped", 30, 20, 10, 240, 2),
+            (3, 78, *phone, "phone", 1000, hour + 60, hour + 120, "interrupted", 10, 10, 0, 30, 1),
+            (4, 79, *phone, "phone", 1000, hour + 200, None, None, None, None, None, None, None),
+        ],
+        "event": [
+            (1, hour, 2, "Volume", "Generic", "client", '{"QMSessionVolume":0.5}'),
+            (2, hour + 1, 2, "Volume", "Generic", "client", '{"QMSessionVolume":0.5,"more":"text, with \\"quotes\\""}'),
+            (3, hour + 300, 2, "Volume", "Summary", "derived", '{"play_seconds":240.0}'),
+            (4, hour + 200, 4, "Playback", "Start", "client", "{}"),
+        ],
+        "volume_stretch": [
+            (1, 1, *player, old, old + 60, 60.0, "Speaker", 1.0, 1.0, 48000, 2, "float", 0, 0),
+            (2, 2, *player, hour, hour + 120, 120.0, "Speaker", 0.5, 0.5, 48000, 2, "float", 0, 0),
+            (3, 2, *player, hour + 120, hour + 240, 120.0, "Headphones", 0.25, 0.25, 48000, 2, "float", 0, 0),
+            (4, 3, *phone, hour + 60, hour + 90, 30.0, "Receiver", 0.75, 0.75, 16000, 1, "int16", 1, 0),
+            (5, 3, *phone, hour + 90, hour + 100, 10.0, None, None, None, None, None, None, None, None),
+        ],
+        "input_stretch": [(1, 3, *phone, hour + 60, hour + 96, 36.0, "Microphone", "chat", "front", "AMR")],
+        "gather_stretch": [(1, 3, *phone, hour + 60, hour + 80, 20.0, "Speaker", 48000, 2, "float")],
+        "issue": [
+            (1, hour + 5, 2, *player, "overload", "out", 0.25, 128, 7),
+            (2, hour + 6, 2, *player, "overload", "out", 0.75, 128, 8),
+            (3, hour + 70, 3, *phone, "overload", "out", 0.1, 256, 9),
+            (4, hour + 80, 3, *phone, "silence", None, 2.0, None, None),
+        ],
+        "haptics": [
+            (1, hour + 1, "com.example.keyboard", "EngineOnDuration", 0.125, None),
+            (2, hour + 2, "com.example.keyboard", "EngineOnDuration", 0.25, None),
+            (3, hour + 3, None, "LeakedHapticsSessionInfo", 1.0, None),
+        ],
+        "channel_value": [
+            (2, hour + 300, "amp", "Tx", "left", "underruns", None, 3),
+            (3, hour + 120, "amp", "Tx", "left", "underruns", None, 4),
+        ],
+        "channel_bucket": [
+            (2, hour + 300, "amp", "Tx", "left", "latency", "ms", 0, 10, 6),
+            (2, hour + 300, "amp", "Tx", "left", "latency", "ms", 10, 100, 1),
+            (3, hour + 120, "amp", "Tx", "left", "latency", "ms", 10, 100, 1),
+        ],
+        "channel_state": [
+            (2, hour + 300, "amp", "Tx", "left", "power", "on", 2, 200, 0.5),
+            (3, hour + 120, "amp", "Tx", "left", "power", "on", 1, 100, 0.25),
+        ],
+    }
+
+
+def begin_of_last_hour():
+    return float(int(time.time()) // 3600 * 3600 - 3600)
+
+
+def make_store(path, hour):
+    with sqlite3.connect(path) as store:
+        store.execute(f"PRAGMA user_version = {schema_version()}")
+        for table, columns in COLUMNS.items():
+            store.execute(f"CREATE TABLE {table} ({columns})")
+            for row in rows(hour)[table]:
+                store.execute(f"INSERT INTO {table} VALUES ({', '.join('?' * len(row))})", row)
+    store.close()
