@@ -1,0 +1,33 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <string>
+
+#include "tools/twctl/report/ReportScope.h"
+#include "values/ValueMap.h"
+
+namespace tonewerk {
+
+// What a report says of the store: everything that its pictures, tables and sentences show.
+struct ReportData {
+  ValueMap data;        // for the page; docs/report.md describes what it shows
+  std::string problem;  // empty on success
+  bool isUnknownSession = false;
+
+  // Reads the store in `directory`. `now` is the time in seconds since 1970.
+  static ReportData read(const std::string& directory, const ReportScope& scope, double now);
+
+  // So many of each at most; what is left out is counted in the data.
+  static constexpr int kMostSessions = 400;  // in the timeline
+  static constexpr int kLongestSessions =
+      320;  // of them those that played longest; the others overloaded most
+  static constexpr int kMostStretches = 10'000;
+  static constexpr int kMostMarks = 3'000;  // issues, and as many input stretches
+  static constexpr int kMostHaptics = 1'000;
+  static constexpr int kMostRows = 250;     // in a table of one session
+  static constexpr int kMostNames = 12;     // applications, devices
+  static constexpr int kMostChannels = 12;  // histograms, and as many states
+  static constexpr int kMostDays = 92;      // in the heat map
+};
+
+}  // namespace tonewerk

@@ -1,0 +1,18 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstdint>
+#include <optional>
+#include <string>
+
+namespace tonewerk {
+
+// What a report is about: everything in the store, or less.
+struct ReportScope {
+  std::optional<double> since;             // seconds since 1970, inclusive
+  std::optional<double> until;             // seconds since 1970, inclusive
+  std::optional<std::string> application;  // a pattern with *, ? and [...]
+  std::optional<std::int64_t> session;     // the `id` of the view `session`
+};
+
+}  // namespace tonewerk

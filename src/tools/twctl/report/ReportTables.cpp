@@ -1,0 +1,183 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "tools/twctl/report/ReportTables.h"
+
+#include <chrono>
+#include <cmath>
+#include <cstddef>
+#include <filesystem>
+#include <limits>
+#include <system_error>
+#include <utility>
+#include <vector>
+
+#include "platform/linux/store/StoreFile.h"
+
+namespace tonewerk {
+namespace {
+
+constexpr std::chrono::seconds kPatience{5};
+constexpr std::int64_t kViews = 9;
+
+constexpr const char* kShown =
+    "CREATE TEMP TABLE shown AS SELECT id, reporter_id, service, application, process, user_id, started_at, "
+    "ended_at, ending, messages, unique_messages, redundant_messages, active_seconds, overloads FROM "
+    "main.session WHERE (?4 IS NULL OR id = ?4) AND (?1 IS NULL OR coalesce(ended_at, 1e18) >= ?1) AND "
+    "(?2 IS NULL OR started_at <= ?2) AND (?3 IS NULL OR application GLOB ?3)";
+
+// A stretch without both times is not cut.
+std::string stretches(const char* table, const char* columns, const char* view) {
+  return std::string("CREATE TEMP TABLE ") + table + " AS SELECT " + columns +
+         ", max(started_at, coalesce(?1, started_at)) AS started, min(ended_at, coalesce(?2, ended_at)) AS "
+         "ended, max(0.0, seconds) * coalesce((min(ended_at, coalesce(?2, ended_at)) - max(started_at, "
+         "coalesce(?1, started_at))) / nullif(ended_at - started_at, 0), 1.0) AS seconds FROM main." +
+         view +
+         " WHERE (?4 IS NULL OR session = ?4) AND (?1 IS NULL OR coalesce(ended_at, started_at, ?1) >= ?1) "
+         "AND (?2 IS NULL OR coalesce(started_at, ?2) <= ?2) AND (?3 IS NULL OR application GLOB ?3)";
+}
+
+std::string trouble() {
+  return std::string(
+             "CREATE TEMP TABLE trouble AS SELECT at, session, application, kind, node, duration_seconds, "
+             "buffer_frames FROM main.issue WHERE (?4 IS NULL OR session = ?4) AND (?3 IS NULL OR "
+             "application GLOB ?3) AND ") +
+         ReportTables::kInTime;
+}
+
+// Only what says for how long the engine was on. A power event has no session: one of a session's application
+// during its life counts for the session.
+std::string felt() {
+  return std::string(
+             "CREATE TEMP TABLE felt AS SELECT at, application, name IS 'LeakedHapticsSessionInfo' AS "
+             "leaked, "
+             "seconds FROM main.haptics WHERE seconds IS NOT NULL AND (?3 IS NULL OR application GLOB ?3) "
+             "AND (?4 IS NULL OR EXISTS (SELECT 1 FROM shown WHERE "
+             "shown.application = haptics.application AND at >= shown.started_at AND "
+             "(shown.ended_at IS NULL OR at <= shown.ended_at))) AND ") +
+         ReportTables::kInTime;
+}
+
+struct Column {
+  std::string name;
+  char kind;
+};
+
+std::vector<Column> columnsOf(std::string_view text) {
+  std::vector<Column> columns;
+  while (!text.empty()) {
+    const std::string_view column = text.substr(0, text.find(' '));
+    text.remove_prefix(std::min(column.size() + 1, text.size()));
+    columns.push_back({std::string(column.substr(0, column.size() - 2)), column.back()});
+  }
+  return columns;
+}
+
+Value cell(const SqliteStatement& row, int column, char kind) {
+  constexpr double kPerUnit = 10'000.0;
+  if (row.isNull(column)) return std::numeric_limits<double>::quiet_NaN();
+  if (kind == 't') return row.text(column);
+  if (kind == 'i') return row.integer(column);
+  return std::round(row.number(column) * kPerUnit) / kPerUnit;
+}
+
+}  // namespace
+
+bool ReportTables::open(const std::string& directory) {
+  if (!openFile(directory) || !hasViews()) return false;
+  run("BEGIN");
+  run(kShown);
+  run(stretches("played", "session, application, device, volume, ringer", "volume_stretch"));
+  run(stretches("heard", "session, device, mode", "input_stretch"));
+  run(trouble());
+  run(felt());
+  return problem_.empty();
+}
+
+void ReportTables::each(const std::string& sql, const std::function<void(const SqliteStatement& row)>& take) {
+  if (!problem_.empty()) return;
+  SqliteStatement statement = database_.prepare(sql);
+  if (scope_.since) statement.bind(1, *scope_.since);
+  if (scope_.until) statement.bind(2, *scope_.until);
+  if (scope_.application) statement.bind(3, std::string_view(*scope_.application));
+  if (scope_.session) statement.bind(4, *scope_.session);
+  for (;;) {
+    switch (statement.step()) {
+      case SqliteStatement::Step::kRow:
+        take(statement);
+        break;
+      case SqliteStatement::Step::kDone:
+        return;
+      case SqliteStatement::Step::kFailed:
+        fail(database_.problem());
+        return;
+    }
+  }
+}
+
+void ReportTables::run(const std::string& sql) {
+  each(sql, [](const SqliteStatement&) {});
+}
+
+ValueMap ReportTables::list(std::string_view columns, const std::string& sql) {
+  const std::vector<Column> kinds = columnsOf(columns);
+  std::vector<Value> names;
+  names.reserve(kinds.size());
+  for (const Column& column : kinds) names.emplace_back(column.name);
+  std::vector<Value> rows;
+  each(sql, [&](const SqliteStatement& row) {
+    std::vector<Value> cells;
+    cells.reserve(kinds.size());
+    for (std::size_t i = 0; i < kinds.size(); ++i) {
+      cells.push_back(cell(row, static_cast<int>(i), kinds[i].kind));
+    }
+    rows.emplace_back(ValueArray(std::move(cells)));
+  });
+  return {{"columns", ValueArray(std::move(names))}, {"rows", ValueArray(std::move(rows))}};
+}
+
+ValueMap ReportTables::first(std::string_view columns, const std::string& sql) {
+  const std::vector<Column> kinds = columnsOf(columns);
+  ValueMap found;
+  each(sql, [&](const SqliteStatement& row) {
+    if (!found.empty()) return;
+    for (std::size_t i = 0; i < kinds.size(); ++i) {
+      found.set(kinds[i].name, cell(row, static_cast<int>(i), kinds[i].kind));
+    }
+  });
+  return found;
+}
+
+bool ReportTables::openFile(const std::string& directory) {
+  path_ = storeFileIn(directory).path;
+  std::error_code error;
+  if (!std::filesystem::exists(path_, error)) {
+    return fail(error ? error.message() : "there is no such file");
+  }
+  if (database_.open(path_, SqliteDatabase::Mode::kReadOnly, kPatience) &&
+      database_.number("PRAGMA user_version")) {
+    return true;
+  }
+  // Reading needs a side file, which a user without write permission for the directory cannot make. Without
+  // one the file does not change, so that it can be read as it is.
+  const std::string problem = database_.problem();
+  database_.close();
+  if (std::filesystem::exists(path_ + "-wal", error)) return fail(problem);
+  return database_.open(path_, SqliteDatabase::Mode::kImmutable, kPatience) || fail(database_.problem());
+}
+
+bool ReportTables::hasViews() {
+  const auto views = database_.number(
+      "SELECT count(*) FROM sqlite_master WHERE name IN ('session', 'event', 'volume_stretch', "
+      "'input_stretch', 'gather_stretch', 'issue', 'haptics', 'channel_value', 'channel_bucket')");
+  if (!views) return fail(database_.problem());
+  if (*views == kViews) return true;
+  return fail(
+      "it has no views for reports; a daemon of this version adds them when it opens the file, and an empty "
+      "file gets them with the first report");
+}
+
+bool ReportTables::fail(const std::string& problem) {
+  problem_ = path_ + ": " + problem;
+  return false;
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,267 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "tools/twctl/report/ReportData.h"
+
+#include <gmock/gmock.h>
+#include <stdlib.h>
+#include <string>
+#include <time.h>
+
+#include "support/TemporaryDirectory.h"
+#include "support/reports/ReportViews.h"
+#include "tools/twctl/report/ReportTables.h"
+#include "values/Value.h"
+
+namespace tonewerk {
+namespace {
+
+using testing::HasSubstr;
+
+constexpr double kDay = 1'795'132'800.0;  // 2026-11-20 00:00 UTC
+constexpr double kNow = kDay + 80'000.0;
+
+class ReportDataTest : public testing::Test {
+ protected:
+  ReportDataTest() {
+    setenv("TZ", "UTC", 1);
+    tzset();
+  }
+  void TearDown() override {
+    unsetenv("TZ");
+    tzset();
+  }
+
+  ValueMap read(const ReportScope& scope = {}) {
+    ReportData report = ReportData::read(directory_.path(), scope, kNow);
+    EXPECT_EQ(report.problem, "");
+    return report.data;
+  }
+  std::string problem(const ReportScope& scope = {}) {
+    return ReportData::read(directory_.path(), scope, kNow).problem;
+  }
+  // The map or list at these keys, as JSON.
+  static std::string at(const ValueMap& data, std::initializer_list<const char*> keys) {
+    const Value* found = nullptr;
+    for (const char* key : keys) {
+      found = (found == nullptr ? data : *found->asMap()).find(key);
+      if (found == nullptr) return std::string("no ") + key;
+    }
+    return found->text();
+  }
+  static std::string rows(const ValueMap& data, const char* part, const char* list) {
+    return data.find(part)->asMap()->find(list)->asMap()->text("rows");
+  }
+
+  TemporaryDirectory directory_;
+  ReportViews views_{directory_.path("reports.db")};
+};
+
+TEST_F(ReportDataTest, AnEmptyStoreHasNothingAndIsNoFailure) {
+  const ValueMap data = read();
+  EXPECT_EQ(at(data, {"totals", "sessions"}), "0");
+  EXPECT_EQ(at(data, {"totals", "playSeconds"}), "0");
+  EXPECT_EQ(at(data, {"hours"}), "[]");
+  EXPECT_EQ(rows(data, "timeline", "lanes"), "[]");
+  EXPECT_EQ(data.number("from"), kNow);
+}
+
+TEST_F(ReportDataTest, SumsWhatWasPlayedByApplicationDeviceAndVolume) {
+  views_.played(1, "Melody", kDay, 3600.0, "Speaker", 0.5);
+  views_.played(2, "Melody", kDay + 7200.0, 1200.0, "Headphones", 0.25);
+  views_.played(3, "Phone", kDay + 9000.0, 60.0, "Speaker", 1.0);
+  const ValueMap data = read();
+  EXPECT_EQ(at(data, {"totals", "playSeconds"}), "4860");
+  EXPECT_EQ(at(data, {"totals", "averageVolume"}), "0.4444");  // (1800 + 300 + 60) / 4860
+  EXPECT_EQ(at(data, {"playing", "byApplication", "top", "rows"}),
+            R"([["Melody",4800.0,0.4375,2],["Phone",60.0,1.0,1]])");
+  EXPECT_EQ(at(data, {"playing", "byDevice", "top", "rows"}),
+            R"([["Speaker",3660.0,0.5082,2],["Headphones",1200.0,0.25,1]])");
+  EXPECT_EQ(rows(data, "playing", "byVolume"), "[[4,1200.0],[8,3600.0],[16,60.0]]");
+  EXPECT_EQ(rows(data, "playing", "onDevices"),
+            R"([["Melody","Speaker",3600.0],["Melody","Headphones",1200.0],["Phone","Speaker",60.0]])");
+}
+
+TEST_F(ReportDataTest, WeightsTheVolumeOfAnHourBySeconds) {
+  views_.played(1, "Melody", kDay + 100.0, 300.0, "Speaker", 1.0);
+  views_.played(2, "Melody", kDay + 3500.0, 200.0, "Speaker", 0.5);
+  EXPECT_EQ(at(read(), {"hours"}), "[[1795132800,400.0,0.875],[1795136400,100.0,0.5]]");
+}
+
+TEST_F(ReportDataTest, CutsStretchesAtTheLimitsOfTime) {
+  views_.played(1, "Melody", kDay, 3600.0, "Speaker", 0.5);
+  views_.played(2, "Before", kDay - 900.0, 600.0, "Speaker", 0.5);
+  views_.played(3, "After", kDay + 3601.0, 600.0, "Speaker", 0.5);
+  views_.overloaded(1, kDay + 10.0, 64);
+  views_.overloaded(1, kDay + 1000.0, 64);
+  const ValueMap data = read({.since = kDay + 900.0, .until = kDay + 1800.0});
+  EXPECT_EQ(at(data, {"totals", "playSeconds"}), "900");
+  EXPECT_EQ(at(data, {"totals", "sessions"}), "1");
+  EXPECT_EQ(at(data, {"totals", "overloads"}), "1");
+  EXPECT_EQ(data.number("from"), kDay + 900.0);
+  EXPECT_EQ(data.number("until"), kDay + 1800.0);
+  EXPECT_EQ(rows(data, "timeline", "played"), "[[1,1795133700.0,1795134600.0,0.5,\"Speaker\",0]]");
+}
+
+TEST_F(ReportDataTest, ChoosesApplicationsByPattern) {
+  views_.played(1, "Melody", kDay, 600.0, "Speaker", 0.5);
+  views_.played(2, "Phone", kDay, 60.0, "Speaker", 0.5);
+  views_.overloaded(2, kDay + 1.0, 64);
+  views_.run("INSERT INTO haptics VALUES (1, " + std::to_string(kDay) + ", 'Phone', 'on', 2.0, 1)");
+  views_.run("INSERT INTO channel_value VALUES (1, " + std::to_string(kDay) +
+             ", 'amp', 'g', 's', 'melody', 'x', 4), (2, " + std::to_string(kDay) +
+             ", 'amp', 'g', 's', 'phone', 'x', 5)");
+  const ValueMap data = read({.application = "Ph*"});
+  EXPECT_EQ(at(data, {"totals", "playSeconds"}), "60");
+  EXPECT_EQ(at(data, {"totals", "overloads"}), "1");
+  EXPECT_EQ(at(data, {"totals", "hapticsSeconds"}), "2");
+  EXPECT_EQ(rows(data, "drivers", "values"), R"([["amp","g","s","phone","x",5]])");
+  EXPECT_EQ(at(read({.application = "M*"}), {"totals", "overloads"}), "0");
+}
+
+TEST_F(ReportDataTest, CountsOverloadsByBufferSizeAndDay) {
+  views_.played(1, "Studio", kDay - 5 * 86'400.0, 600.0, "Speaker", 0.5);
+  views_.played(2, "Studio", kDay + 20'000.0, 600.0, "Speaker", 0.5);
+  views_.overloaded(1, kDay - 5 * 86'400.0 + 1.0, 64);
+  views_.overloaded(2, kDay + 20'001.0, 64);
+  views_.overloaded(2, kDay + 20'002.0, 128);
+  const ValueMap data = read();
+  EXPECT_EQ(rows(data, "issues", "byBuffer"), "[[64,2,1.0],[128,1,0.5]]");
+  EXPECT_EQ(rows(data, "issues", "overTime"), "[[1794700800,1],[1795132800,2]]");
+  EXPECT_EQ(at(data, {"issues", "stepSeconds"}), "86400");
+  const ValueMap shortTime = read({.since = kDay});
+  EXPECT_EQ(rows(shortTime, "issues", "overTime"), "[[1795150800,2]]");
+  EXPECT_EQ(at(shortTime, {"issues", "stepSeconds"}), "3600");
+}
+
+TEST_F(ReportDataTest, KeepsTheLongestAndTheMostOverloadedSessionsAndCountsTheOthers) {
+  views_.run("BEGIN");
+  for (int i = 1; i <= ReportData::kMostSessions + 50; ++i) {
+    views_.played(i, "Melody", kDay + i, 10.0 + i, "Speaker", 0.5);
+  }
+  views_.overloaded(1, kDay + 5.0, 64);  // the shortest one
+  views_.run("COMMIT");
+  const ValueMap data = read();
+  const std::string lanes = rows(data, "timeline", "lanes");
+  EXPECT_THAT(lanes, HasSubstr("[[1,1001,"));
+  EXPECT_THAT(lanes, HasSubstr("[450,1450,"));
+  EXPECT_THAT(lanes, testing::Not(HasSubstr("[2,1002,")));
+  EXPECT_EQ(at(data, {"timeline", "leftOut", "sessions"}),
+            std::to_string(ReportData::kMostSessions + 50 - ReportData::kLongestSessions - 1));
+  EXPECT_EQ(at(data, {"totals", "sessions"}), std::to_string(ReportData::kMostSessions + 50));
+}
+
+TEST_F(ReportDataTest, KeepsTheLongestStretchesOfEverySession) {
+  const std::string stretches = "WITH RECURSIVE n(i) AS (SELECT 1 UNION ALL SELECT i + 1 FROM n WHERE i < " +
+                                std::to_string(ReportData::kMostStretches + 100) +
+                                ") INSERT INTO volume_stretch SELECT i, 1, 's', 'Melody', 1795132800 + i, "
+                                "1795132800.5 + i, 0.5, 'Speaker', "
+                                "0.5, 0.5, 48000, 2, 'f', 0 FROM n";
+  views_.played(1, "Melody", kDay, 3600.0, "Speaker", 0.5);
+  views_.played(2, "Phone", kDay, 0.1, "Earpiece", 0.75);
+  views_.run(stretches);
+  const ValueMap data = read();
+  EXPECT_EQ(data.find("timeline")->asMap()->find("played")->asMap()->find("rows")->asArray()->size(),
+            static_cast<std::size_t>(ReportData::kMostStretches));
+  EXPECT_THAT(rows(data, "timeline", "played"),
+              testing::AllOf(HasSubstr("[1,1795132800.0,1795136400.0,"), HasSubstr("\"Earpiece\"")));
+  EXPECT_EQ(at(data, {"timeline", "leftOut", "stretches"}), "102");
+}
+
+TEST_F(ReportDataTest, NamesTheMostPlayedApplicationsAndAddsUpTheOthers) {
+  for (int i = 0; i < ReportData::kMostNames + 3; ++i) {
+    views_.played(i + 1, "App " + std::to_string(i), kDay, 100.0 - i, "Speaker", 0.5);
+  }
+  const ValueMap data = read();
+  EXPECT_EQ(at(data, {"playing", "byApplication", "rest"}),
+            R"({"names":3,"seconds":261.0})");  // 88, 87 and 86
+}
+
+TEST_F(ReportDataTest, AddsUpWhatDriversCountedInAllSessions) {
+  views_.played(1, "Melody", kDay, 100.0, "Speaker", 0.5);
+  for (const char* session : {"1", "2"}) {
+    views_.run(std::string("INSERT INTO channel_bucket VALUES (") + session +
+               ", 1795132900, 'amp', 'g', NULL, 'wake', 'ms', 0, 5, 3), (" + session +
+               ", 1795132900, 'amp', 'g', '', 'wake', 'ms', 5, 9, 4)");
+    views_.run(std::string("INSERT INTO channel_state VALUES (") + session +
+               ", 1795132900, 'amp', 'g', '', 'power', 'on', 2, 700, 0.7)");
+  }
+  const ValueMap data = read();
+  EXPECT_EQ(rows(data, "drivers", "buckets"),
+            R"([["amp","g","","wake","ms",0,5,6],["amp","g","","wake","ms",5,9,8]])");
+  EXPECT_EQ(rows(data, "drivers", "states"), R"([["amp","g","","power","","on",4,1400]])");
+  EXPECT_EQ(rows(read({.session = 1}), "drivers", "states"), R"([["amp","g","","power","","on",2,700]])");
+}
+
+TEST_F(ReportDataTest, CountsLeaksOfTheHapticsEngineApartAndItsStatusNot) {
+  views_.run(
+      "INSERT INTO haptics VALUES (1, 1795132800, 'Game', 'Flumen_Haptics_EngineOnDuration', 2.0, NULL), (2, "
+      "1795132801, 'Game', 'Flumen_Haptics_ClientStatus', NULL, 1), (3, 1795132802, NULL, "
+      "'LeakedHapticsSessionInfo', 3600.0, NULL)");
+  const ValueMap data = read();
+  EXPECT_EQ(at(data, {"totals", "hapticsEvents"}), "1");
+  EXPECT_EQ(at(data, {"totals", "hapticsSeconds"}), "2");
+  EXPECT_EQ(at(data, {"totals", "hapticsLeaks"}), "1");
+  EXPECT_EQ(at(data, {"totals", "leakedSeconds"}), "3600");
+  EXPECT_EQ(at(data, {"haptics", "rows"}), R"([["Game",1,2.0]])");
+  EXPECT_EQ(rows(data, "timeline", "haptics"), R"([[1795132800.0,"Game",2.0]])");
+}
+
+TEST_F(ReportDataTest, ASessionsPageHasOnlyWhatIsOfThisSession) {
+  views_.played(7, "Melody", kDay, 100.0, "Speaker", 0.5);
+  views_.played(8, "Phone", kDay, 900.0, "Headphones", 0.5);
+  views_.overloaded(7, kDay + 5.0, 32);
+  views_.run(
+      "INSERT INTO event VALUES (1, 1795132800, 7, 'Volume', 'Generic', 'client', '{}'), (2, 1795132801, 7, "
+      "'Volume', 'Generic', 'client', '{}'), (3, 1795132802, 7, 'Volume', 'Summary', 'derived', '{}'), (4, "
+      "1795132802, 8, 'Volume', 'Summary', 'derived', '{}')");
+  views_.run(
+      "INSERT INTO haptics VALUES (1, 1795132850, 'Melody', 'on', 2.0, 1), (2, 1795132999, 'Melody', 'on', "
+      "4.0, 1), (3, 1795132850, 'Phone', 'on', 8.0, 1)");
+  const ValueMap data = read({.session = 7});
+  EXPECT_EQ(at(data, {"totals", "playSeconds"}), "100");
+  EXPECT_EQ(at(data, {"totals", "hapticsSeconds"}), "2");
+  EXPECT_EQ(at(data, {"session", "application"}), "Melody");
+  EXPECT_EQ(at(data, {"session", "kinds", "rows"}),
+            R"([["Volume","Generic","client",2,1795132800.0,1795132801.0],)"
+            R"(["Volume","Summary","derived",1,1795132802.0,1795132802.0]])");
+  EXPECT_EQ(at(data, {"session", "issues", "rows"}), R"([[1795132805.0,"overload","mixer",0.5,32]])");
+}
+
+TEST_F(ReportDataTest, SaysThatASessionIsUnknownAndWhichOnesHaveThisReporterIdentifier) {
+  views_.played(7, "Melody", kDay, 100.0, "Speaker", 0.5);
+  views_.played(8, "Melody", kDay, 100.0, "Speaker", 0.5);
+  views_.run("UPDATE session SET reporter_id = 1007");
+  EXPECT_THAT(problem({.session = 1007}), HasSubstr("no session has the id 1007; the reporter identifier "
+                                                    "1007 is that of these sessions, newest first: 8, 7"));
+  EXPECT_THAT(problem({.session = 99}), HasSubstr("no session has the id 99; "));
+  EXPECT_TRUE(ReportData::read(directory_.path(), {.session = 99}, kNow).isUnknownSession);
+}
+
+TEST_F(ReportDataTest, ARunningSessionHasNoEndAndLastsUntilTheNewestReport) {
+  views_.played(1, "Melody", kDay, 100.0, "Speaker", 0.5);
+  views_.run("UPDATE session SET ended_at = NULL, ending = NULL, messages = NULL, overloads = NULL");
+  const ValueMap data = read();
+  EXPECT_EQ(at(data, {"totals", "running"}), "1");
+  EXPECT_EQ(data.number("until"), kDay + 100.0);
+  EXPECT_THAT(rows(data, "timeline", "lanes"), HasSubstr("1795132800.0,null,null,null,"));
+}
+
+TEST_F(ReportDataTest, ValuesThatAreNotKnownAreNull) {
+  views_.run(
+      "INSERT INTO volume_stretch (session, started_at, ended_at, seconds) VALUES (NULL, NULL, NULL, 5), "
+      "(NULL, "
+      "1795132800, NULL, 7); INSERT INTO issue (at, kind) VALUES (1795132800, 'overload')");
+  const ValueMap data = read();
+  EXPECT_EQ(at(data, {"totals", "playSeconds"}), "12");
+  EXPECT_EQ(at(data, {"playing", "byApplication", "top", "rows"}), "[[null,12.0,null,0]]");
+  EXPECT_EQ(rows(data, "issues", "byBuffer"), "[[null,1,0.0]]");
+}
+
+TEST_F(ReportDataTest, NamesTheFileAndWhatItLacks) {
+  views_.run("DROP TABLE volume_stretch");
+  EXPECT_THAT(problem(), testing::AllOf(HasSubstr("reports.db: "), HasSubstr("it has no views for reports")));
+  const TemporaryDirectory empty;
+  EXPECT_THAT(ReportData::read(empty.path(), {}, kNow).problem, HasSubstr("there is no such file"));
+}
+
+}  // namespace
+}  // namespace tonewerk
