@@ -1,0 +1,18 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <string>
+#include <string_view>
+
+#include "values/ValueMap.h"
+
+namespace tonewerk {
+
+// Makes the page: one HTML file that needs nothing else. Only the scripts that have `nonce` run, which is a
+// text of letters and digits that nobody can guess.
+[[nodiscard]] std::string reportPage(const ValueMap& data, std::string_view nonce);
+
+// A new nonce, from the system's random numbers.
+[[nodiscard]] std::string newNonce();
+
+}  // namespace tonewerk

@@ -1,0 +1,786 @@
+// SPDX-License-Identifier: Apache-2.0
+//
+// Draws the page from the element #data. docs/report.md says what it shows. All names in the data come from programs on the
+// device, so they are only ever set as text.
+"use strict";
+(() => {
+  // Control characters, and those that turn the direction of writing and so could change how the text around a name reads.
+  const UNPRINTABLE = /[\u0000-\u001f\u007f-\u009f\u061c\u200e\u200f\u2028\u2029\u202a-\u202e\u2066-\u2069]/g;
+  const data = JSON.parse(document.getElementById("data").textContent, (_, value) => (typeof value === "string" ? value.replace(UNPRINTABLE, "\ufffd") : value));
+  const page = document.getElementById("page");
+  const { plot, select } = charts;
+
+  // ---- Numbers and times for people
+
+  const UNKNOWN = "not known";
+  const named = (name) => (name === null || name === undefined || name === "" ? UNKNOWN : String(name));
+  const whole = new Intl.NumberFormat("en-GB", { maximumFractionDigits: 0 });
+  const count = (number) => (number === null || number === undefined ? "" : whole.format(number));
+  const percent = (share) => (share === null || share === undefined ? "" : `${Math.round(share * 100)} %`);
+  const many = (number, one, more) => `${count(number)} ${number === 1 ? one : more}`;
+
+  // "3 h 12 min", "4 min 10 s", "2.5 s", "20 ms"
+  function duration(seconds) {
+    if (seconds === null || seconds === undefined) return "";
+    if (seconds === 0) return "0 s";
+    if (seconds < 1) return `${Math.max(1, Math.round(seconds * 1000))} ms`;
+    if (seconds < 9.95) return `${Math.round(seconds * 10) / 10} s`;
+    if (seconds < 59.5) return `${Math.round(seconds)} s`;
+    if (seconds < 3570) {
+      const all = Math.round(seconds);
+      return all < 600 && all % 60 ? `${Math.floor(all / 60)} min ${all % 60} s` : `${Math.round(all / 60)} min`;
+    }
+    const minutes = Math.round(seconds / 60);
+    if (minutes >= 6000) return `${count(minutes / 60)} h`;
+    return minutes % 60 ? `${Math.floor(minutes / 60)} h ${minutes % 60} min` : `${minutes / 60} h`;
+  }
+
+  // The device's clock at a time, as a date whose UTC fields are those of that clock.
+  function local(time) {
+    let offset = data.offsets[0][1];
+    for (const [from, seconds] of data.offsets) if (from <= time) offset = seconds;
+    return new Date((time + offset) * 1000);
+  }
+  const inUtc = (options) => new Intl.DateTimeFormat("en-GB", { ...options, timeZone: "UTC" });
+  const dayText = inUtc({ day: "numeric", month: "short", year: "numeric" });
+  const shortDayText = inUtc({ weekday: "short", day: "numeric", month: "short" });
+  const minuteText = inUtc({ day: "numeric", month: "short", year: "numeric", hour: "2-digit", minute: "2-digit", hourCycle: "h23" });
+  const secondText = inUtc({ day: "numeric", month: "short", year: "numeric", hour: "2-digit", minute: "2-digit", second: "2-digit", hourCycle: "h23" });
+  const at = (time) => (time === null || time === undefined ? "" : secondText.format(local(time)));
+  const atMinute = (time) => minuteText.format(local(time));
+  // Labels of a time axis over so many seconds. The first label, and that of a new day, also has the day.
+  function tickText(seconds) {
+    if (seconds > 4 * 86400) return undefined;
+    const clock = inUtc({ hour: "2-digit", minute: "2-digit", hourCycle: "h23", ...(seconds < 300 ? { second: "2-digit" } : {}) });
+    const day = inUtc({ day: "numeric", month: "short" });
+    return (date, i) => (i === 0 || date % 86400000 === 0 ? `${clock.format(date)}\n${day.format(date)}` : clock.format(date));
+  }
+  const between = (from, until) => `${atMinute(from)} to ${atMinute(until)}`;
+
+  // ---- Elements
+
+  // Children are texts or elements.
+  function el(tag, attributes, ...children) {
+    const made = document.createElement(tag);
+    for (const [name, value] of Object.entries(attributes ?? {})) if (value !== undefined) made.setAttribute(name, value);
+    made.append(...children.filter((child) => child !== null));
+    return made;
+  }
+  // [{column: value}] of {"columns": [...], "rows": [[...]]}
+  const rowsOf = (list) => list.rows.map((row) => Object.fromEntries(list.columns.map((name, i) => [name, row[i]])));
+  const shortened = (text, most) => (text.length <= most ? text : `${text.slice(0, Math.max(1, most - 1))}…`);
+  const sum = (rows, value) => rows.reduce((all, row) => all + (value(row) ?? 0), 0);
+
+  const MOST_TABLE_ROWS = 400;
+  const MOST_LETTERS = 100; // of a name
+  // columns: [heading, cell(row), isNumber]
+  function table(columns, rows) {
+    const head = el("tr", {}, ...columns.map(([heading, , isNumber]) => el("th", { scope: "col", class: isNumber ? "number" : "" }, heading)));
+    const body = rows.slice(0, MOST_TABLE_ROWS).map((row) =>
+      el("tr", {}, ...columns.map(([, cell, isNumber]) => el("td", { class: isNumber ? "number" : "" }, shortened(String(cell(row) ?? ""), MOST_LETTERS)))));
+    const made = el("div", { class: "scroll", tabindex: "0", role: "region", "aria-label": "Table" },
+      el("table", {}, el("thead", {}, head), el("tbody", {}, ...body)));
+    if (rows.length <= MOST_TABLE_ROWS) return made;
+    return el("div", {}, made, el("p", { class: "quiet" }, `The table has the first ${MOST_TABLE_ROWS} of ${count(rows.length)} rows.`));
+  }
+
+  const empty = (text) => el("p", { class: "empty" }, text);
+  const legend = (entries) =>
+    el("ul", { class: "legend" }, ...entries.map(([text, colour, kind]) => {
+      const mark = el("i", { class: kind ?? "", "aria-hidden": "true" });
+      mark.style.background = colour;
+      return el("li", {}, mark, shortened(text, MOST_LETTERS / 2));
+    }));
+
+  const pictures = [];
+  let pictureNumber = 0;
+
+  // A picture with its title, what it shows in words, and its numbers as a table. draw(width) returns an SVG element.
+  function figure({ id, title, about, draw, columns, rows, legendOf, emptyText }) {
+    const caption = el("figcaption", {}, el("h3", {}, title), about ? el("p", {}, about) : null);
+    if (!draw) return el("figure", { id }, caption, empty(emptyText));
+    const number = ++pictureNumber;
+    const box = el("div", { class: "picture" });
+    const picture = {
+      box,
+      redraw(width) {
+        const svg = draw(width);
+        const name = document.createElementNS("http://www.w3.org/2000/svg", "title");
+        name.id = `picture-${number}-title`;
+        name.textContent = title;
+        const text = document.createElementNS("http://www.w3.org/2000/svg", "desc");
+        text.id = `picture-${number}-text`;
+        text.textContent = about ?? title;
+        svg.prepend(name, text);
+        svg.setAttribute("role", "img");
+        svg.setAttribute("aria-labelledby", name.id);
+        svg.setAttribute("aria-describedby", text.id);
+        box.replaceChildren(svg);
+        return svg;
+      },
+    };
+    pictures.push(picture);
+    return el("figure", { id }, caption, box, legendOf ? legend(legendOf) : null,
+      el("details", {}, el("summary", {}, "Numbers as a table"), table(columns, rows)));
+  }
+
+  // Gives each element of a mark the values of its datum as data attributes.
+  const tagged = (rows, options, attributes) => ({
+    ...options,
+    render(index, scales, values, dimensions, context, next) {
+      const group = next(index, scales, values, dimensions, context);
+      let inner = group;
+      while (inner.children.length === 1 && inner.firstElementChild.tagName === "g") inner = inner.firstElementChild; // clipped marks
+      [...inner.children].forEach((child, i) => {
+        for (const [name, value] of Object.entries(attributes(rows[index[i]]))) child.setAttribute(`data-${name}`, value);
+      });
+      return group;
+    },
+  });
+
+  // ---- Colours: a device has the same one in every picture
+
+  const played = rowsOf(data.playing.byDevice.top);
+  const colours = new Map(played.slice(0, 7).map(({ name }, i) => [named(name), `var(--c${i + 1})`]));
+  const colourOf = (device) => colours.get(named(device)) ?? "var(--c8)";
+  function deviceLegend(rows) {
+    const used = new Set(rows.map(({ device }) => named(device)));
+    const entries = [...colours].filter(([name]) => used.has(name));
+    const others = [...used].some((name) => !colours.has(name));
+    return others ? [...entries, ["other devices", "var(--c8)"]] : entries;
+  }
+
+  // ---- The beginning: which device, which time, what matters
+
+  const totals = data.totals;
+  const session = data.session;
+  const overloaded = rowsOf(data.issues.byBuffer);
+  const isEmpty = totals.sessions === 0 && totals.playSeconds === 0 && totals.overloads + totals.otherIssues + totals.hapticsEvents === 0;
+
+  function heading() {
+    const device = data.device?.name ? `${data.device.name} (${data.device.host})` : data.device?.host || "this device";
+    const title = session ? `Audio session #${session.id} on ${device}` : `Audio report of ${device}`;
+    document.title = title;
+    const filter = data.filter ?? {};
+    const limits = filter.application ? `Only applications that fit “${filter.application}”. ` : "";
+    const time = isEmpty ? "" : `${between(data.from, data.until)}, by the device's clock (${data.zone || "UTC"}). `;
+    return el("header", {}, el("h1", {}, title), el("p", { class: "quiet" }, `${time}${limits}Made on ${atMinute(data.generated)}.`));
+  }
+
+  // What a reader must know, in whole sentences.
+  function findings() {
+    const said = [];
+    if (isEmpty) return [session ? "The store has nothing else about this session." : "Nothing was recorded in this time: no session, no playing time, no issue."];
+    const [application] = rowsOf(data.playing.byApplication.top);
+    const [device] = played;
+    if (application && totals.playSeconds > 0) {
+      const shareOf = (row) => (row.seconds / totals.playSeconds > 0.995 ? "all of it" : `${percent(row.seconds / totals.playSeconds)} of it`);
+      const time = duration(totals.playSeconds);
+      if (session) said.push(`It played ${time}, ${shareOf(device)} on ${named(device.name)}.`);
+      else said.push(`The device played ${time}, ${shareOf(application)} for ${named(application.name)} and ${shareOf(device)} on ${named(device.name)}.`);
+    } else {
+      said.push("Nothing was played.");
+    }
+    if (totals.overloads > 0) {
+      const worst = [...overloaded].sort((a, b) => b.count - a.count)[0];
+      const buffer = worst.frames === null ? "" : `; ${worst.count === totals.overloads ? "all" : percent(worst.count / totals.overloads)} of them with a buffer of ${count(worst.frames)} frames`;
+      said.push(`The audio overloaded ${many(totals.overloads, "time", "times")}${session ? "" : ` in ${many(totals.overloadedSessions, "session", "sessions")}`}${buffer}.`);
+    } else {
+      said.push("The audio never overloaded.");
+    }
+    if (totals.otherIssues > 0) {
+      const kinds = rowsOf(data.issues.byKind).filter(({ kind }) => kind !== "overload").map((row) => `${named(row.kind)} (${count(row.count)})`);
+      said.push(`Other issues: ${kinds.join(", ")}.`);
+    }
+    if (totals.hapticsLeaks > 0) said.push(`The haptics engine stayed on without a client: ${many(totals.hapticsLeaks, "time", "times")}, together ${duration(totals.leakedSeconds)}.`);
+    const broken = totals.interrupted + totals.disconnected;
+    if (broken > 0 && !session) said.push(`${many(broken, "session", "sessions")} ended without a stop: ${many(totals.disconnected, "client", "clients")} disconnected, ${many(totals.interrupted, "session was", "sessions were")} interrupted because the daemon or the device ended.`);
+    if (data.daemon) said.push(daemonSentence());
+    return said;
+  }
+
+  function daemonSentence() {
+    const { answers, reason, refused, sinks } = data.daemon;
+    if (!answers) return `No daemon answered when this page was made (${reason}), so the page cannot say what was dropped or refused.`;
+    const dropped = sum(sinks, (sink) => sink.dropped);
+    const hanging = sinks.filter((sink) => sink.hangs > 0).map((sink) => sink.sink);
+    const parts = [];
+    if (dropped > 0) parts.push(`dropped ${many(dropped, "report", "reports")}`);
+    if (refused.length > 0) parts.push(`refused requests ${many(sum(refused, (row) => row.times), "time", "times")}`);
+    if (hanging.length > 0) parts.push(`has sinks that hang (${hanging.join(", ")})`);
+    return parts.length ? `Since it began, the daemon ${parts.join(", ")}.` : "The daemon answers. Since it began it dropped and refused nothing.";
+  }
+
+  function overloadRate() {
+    if (totals.overloads === 0) return "none is good";
+    if (totals.playSeconds < 3600) return `in ${duration(totals.playSeconds)} played`;
+    const rate = totals.overloads / totals.playSeconds * 3600;
+    return `${rate < 10 ? rate.toPrecision(2) : count(rate)} an hour played`;
+  }
+
+  function numbers() {
+    const tile = (label, value, note, isBad) => el("li", { class: isBad ? "bad" : "" }, el("span", { class: "label" }, label), el("b", {}, value), el("span", {}, note));
+    const tiles = [];
+    if (!session) tiles.push(tile("Sessions", count(totals.sessions), totals.running ? `${count(totals.running)} still ${totals.running === 1 ? "runs" : "run"}` : `of ${many(totals.applications, "application", "applications")}`));
+    tiles.push(tile("Played", duration(totals.playSeconds), `on ${many(totals.devices, "device", "devices")}`));
+    tiles.push(tile("Average volume", totals.averageVolume === null ? UNKNOWN : percent(totals.averageVolume), "weighted by time"));
+    tiles.push(tile("Overloads", count(totals.overloads), overloadRate(), totals.overloads > 0));
+    tiles.push(tile("Input", duration(totals.inputSeconds), "microphones and other inputs"));
+    tiles.push(tile("Haptics", duration(totals.hapticsSeconds), many(totals.hapticsEvents, "event", "events")));
+    if (totals.messages > 0) tiles.push(tile("Messages", count(totals.messages), `${percent(totals.redundantMessages / totals.messages)} said nothing new`));
+    return el("ul", { class: "numbers" }, ...tiles);
+  }
+
+  // ---- The timeline
+
+  // The heights of a lane's parts, in pixels. On paper they are smaller, so that the timeline fits below the numbers.
+  const SCREEN = { label: 17, band: 5, volume: 32, below: 14 };
+  const PRINT = { label: 15, band: 4, volume: 16, below: 11 };
+  let isPrinting = false;
+  const MOST_LANES = 24;
+  const MOST_LANES_OF_APPLICATION = 4;
+
+  // The lanes with their sessions: one a session, or one an application, and more for its sessions at the same time.
+  function lanesOf(sessions, mode) {
+    if (mode === "session") {
+      const longest = [...sessions].sort((a, b) => b.playSeconds + b.overloads - a.playSeconds - a.overloads).slice(0, MOST_LANES);
+      return longest.sort((a, b) => a.started - b.started).map((one) => ({
+        label: `${named(one.application)} #${one.id}${one.overloads ? `, ${many(one.overloads, "overload", "overloads")}` : ""}`, sessions: [one] }));
+    }
+    const lanes = [];
+    for (const one of [...sessions].sort((a, b) => a.started - b.started)) {
+      const application = named(one.application);
+      const taken = lanes.filter((lane) => lane.application === application);
+      const free = taken.find((lane) => lane.until <= one.started);
+      if (!free && taken.length === MOST_LANES_OF_APPLICATION) continue;
+      const lane = free ?? { application, sessions: [], seconds: 0 };
+      if (!free) lanes.push(lane);
+      lane.sessions.push(one);
+      lane.until = one.ended ?? data.until;
+    }
+    const seconds = new Map();
+    for (const lane of lanes) seconds.set(lane.application, (seconds.get(lane.application) ?? 0) + sum(lane.sessions, (one) => one.playSeconds) + 1);
+    lanes.sort((a, b) => seconds.get(b.application) - seconds.get(a.application) || (a.application < b.application ? -1 : a.application > b.application ? 1 : 0));
+    const before = new Map();
+    for (const lane of lanes) {
+      const place = (before.get(lane.application) ?? 0) + 1;
+      before.set(lane.application, place);
+      lane.label = place === 1 ? lane.application : `${lane.application}, at the same time (${place})`;
+    }
+    return lanes.slice(0, MOST_LANES);
+  }
+
+  function timeline() {
+    const sessions = rowsOf(data.timeline.lanes).filter(({ started }) => started !== null);
+    const stretches = rowsOf(data.timeline.played).map((row) => ({ ...row, ended: row.ended ?? row.started }));
+    const inputs = rowsOf(data.timeline.heard).map((row) => ({ ...row, ended: row.ended ?? row.started }));
+    const issues = rowsOf(data.timeline.issues);
+    const haptics = rowsOf(data.timeline.haptics);
+    const hours = session || data.until - data.from < 4 * 3600 ? [] : data.hours.map(([from, seconds]) => ({ from, seconds }));
+    const title = session ? "The session over time" : "Sessions over time";
+    if (sessions.length === 0 && haptics.length === 0) {
+      return figure({ id: "timeline", title, emptyText: "No session was open in this time." });
+    }
+    const byId = new Map(sessions.map((one) => [one.id, one]));
+    let mode = session || sessions.length <= 12 ? "session" : "application";
+    const pad = Math.min(1800, Math.max(1, (data.until - data.from) * 0.005));
+    const all = [data.from - pad, data.until + pad];
+    let shown = [0, 1]; // the visible part of `all`
+    let lanes = [];
+    const margin = { left: 6, right: 10 };
+
+    const columns = [
+      ["Session", (row) => `#${row.id}`], ["Application", (row) => named(row.application)], ["Service", (row) => named(row.service)],
+      ["Started", (row) => at(row.started)], ["Ended", (row) => (row.ended === null ? "still runs" : at(row.ended))],
+      ["Ending", (row) => row.ending ?? ""], ["Played", (row) => duration(row.playSeconds), true], ["Overloads", (row) => count(row.overloads), true],
+    ];
+
+    function draw(width) {
+      const { label: LABEL, band: BAND, volume: VOLUME, below: BELOW } = isPrinting ? PRINT : SCREEN;
+      const LANE = LABEL + BAND + VOLUME + BELOW;
+      const size = width - margin.left - margin.right;
+      const span = all[1] - all[0];
+      const from = all[0] + shown[0] * span;
+      const until = all[0] + shown[1] * span;
+      const least = (until - from) / size * 1.5; // nothing is thinner than this, so that a short sound can be seen
+      const inside = (started, ended) => ended >= from && started <= until;
+      lanes = lanesOf(sessions, mode);
+      const top = hours.length ? LABEL + VOLUME + 8 : 0;
+      const laneOf = new Map(lanes.flatMap((lane, i) => lane.sessions.map((one) => [one.id, i])));
+      const topOf = (id) => top + laneOf.get(id) * LANE + LABEL;
+      const baseOf = (id) => topOf(id) + BAND + VOLUME;
+      const hasLane = (row) => laneOf.has(row.session ?? row.id);
+      const hapticsTop = top + lanes.length * LANE;
+      const height = hapticsTop + (haptics.length ? LABEL + 22 : 0);
+      const most = Math.max(1, ...hours.map(({ seconds }) => seconds));
+      const x = (time) => local(time);
+      const wide = (started, ended) => x(Math.max(ended, started + least));
+
+      const lives = sessions.filter((row) => hasLane(row) && inside(row.started, row.ended ?? data.until));
+      const runs = stretches.filter((row) => hasLane(row) && inside(row.started, row.ended));
+      const rings = runs.filter((row) => row.ringer === 1);
+      const hears = inputs.filter((row) => hasLane(row) && inside(row.started, row.ended));
+      const marks = issues.filter((row) => hasLane(row) && inside(row.at, row.at));
+      const overloads = marks.filter((row) => row.kind === "overload");
+      const others = marks.filter((row) => row.kind !== "overload");
+      const felt = haptics.filter((row) => inside(row.at, row.at));
+      const visible = hours.filter((row) => inside(row.from, row.from + 3600));
+      const nameOf = (row) => `${named(byId.get(row.session ?? row.id)?.application)} #${row.session ?? row.id}`;
+      // The line would hide the area of a stretch that is hardly wider.
+      const isNarrow = (row) => (row.ended - row.started) / (until - from) * size < 3;
+      // The step line of the volume: two points a stretch, and none between stretches that do not touch.
+      const steps = [];
+      for (const row of runs) {
+        if (isNarrow(row)) continue;
+        const last = steps[steps.length - 1];
+        if (last && (last.session !== row.session || row.started - last.time > 1)) steps.push({ session: row.session, time: row.started, volume: null });
+        steps.push({ session: row.session, time: row.started, volume: row.volume }, { session: row.session, time: row.ended, volume: row.volume });
+      }
+      const heightOf = (id, volume) => baseOf(id) - VOLUME * Math.min(1, Math.max(0, volume ?? 0));
+      const labels = lanes.map((lane, i) => ({ y: top + i * LANE + LABEL - 5, text: lane.label }));
+      if (hours.length) labels.unshift({ y: LABEL - 5, text: "All sessions: time played in each hour" });
+      if (haptics.length) labels.push({ y: hapticsTop + LABEL - 5, text: "Haptics" });
+      const letters = Math.min(MOST_LETTERS, Math.floor(size / 7.4));
+
+      const svg = plot({
+        width, height: height + 34, marginLeft: margin.left, marginRight: margin.right, marginTop: 2, marginBottom: 28,
+        x: { type: "utc", domain: [local(from), local(until)], label: null },
+        y: { type: "linear", domain: [0, height], range: [2, 2 + height], axis: null },
+        marks: [
+          charts.axisX({ ticks: Math.max(2, Math.round(size / 110)), tickSize: 4, tickFormat: tickText(until - from) }),
+          charts.gridX({ ticks: Math.max(2, Math.round(size / 110)), stroke: "var(--line)", strokeOpacity: 1 }),
+          charts.rect(visible, tagged(visible, { x1: (d) => x(d.from), x2: (d) => x(d.from + 3600), y1: (d) => LABEL + VOLUME - VOLUME * d.seconds / most,
+            y2: LABEL + VOLUME, fill: "var(--c8)", clip: true, title: (d) => `${atMinute(d.from)}: ${duration(d.seconds)} played in this hour` },
+          (d) => ({ mark: "hour", from: d.from, seconds: d.seconds }))),
+          charts.ruleY(lanes.map((_, i) => top + i * LANE), { stroke: "var(--line)" }),
+          charts.rect(lives, tagged(lives, { x1: (d) => x(d.started), x2: (d) => wide(d.started, d.ended ?? data.until), y1: (d) => baseOf(d.id), y2: (d) => baseOf(d.id) + 2,
+            fill: "var(--quiet)", clip: true, title: (d) => `${nameOf(d)}, ${at(d.started)} to ${d.ended === null ? "now: it still runs" : at(d.ended)}` },
+          (d) => ({ mark: "session", session: d.id, started: d.started, ended: d.ended ?? data.until }))),
+          charts.rect(runs, tagged(runs, { x1: (d) => x(d.started), x2: (d) => x(d.ended), y1: (d) => heightOf(d.session, d.volume), y2: (d) => baseOf(d.session),
+            fill: (d) => colourOf(d.device), fillOpacity: (d) => (isNarrow(d) ? 0.9 : 0.3), clip: true,
+            title: (d) => `${nameOf(d)}: ${named(d.device)} at ${percent(d.volume) || "unknown volume"}, ${duration(d.ended - d.started)} from ${at(d.started)}` },
+          (d) => ({ mark: "stretch", session: d.session, started: d.started, ended: d.ended, volume: d.volume }))),
+          charts.line(steps, { x: (d) => x(d.time), y: (d) => (d.volume === null ? NaN : heightOf(d.session, d.volume)), z: "session", stroke: "var(--ink)", strokeWidth: 1.25, clip: true }),
+          charts.rect(runs, tagged(runs, { x1: (d) => x(d.started), x2: (d) => wide(d.started, d.ended), y1: (d) => topOf(d.session), y2: (d) => topOf(d.session) + BAND,
+            fill: (d) => colourOf(d.device), clip: true }, (d) => ({ mark: "device", device: named(d.device) }))),
+          charts.rect(rings, tagged(rings, { x1: (d) => x(d.started), x2: (d) => wide(d.started, d.ended), y1: (d) => baseOf(d.session) + 3, y2: (d) => baseOf(d.session) + 6, fill: "var(--bell)", clip: true },
+            (d) => ({ mark: "ringer", session: d.session }))),
+          charts.rect(hears, tagged(hears, { x1: (d) => x(d.started), x2: (d) => wide(d.started, d.ended), y1: (d) => baseOf(d.session) + 7, y2: (d) => baseOf(d.session) + 10, fill: "var(--input)", clip: true,
+            title: (d) => `${nameOf(d)}: input from ${named(d.device)}, ${duration(d.ended - d.started)}` }, (d) => ({ mark: "input", session: d.session }))),
+          charts.ruleX(overloads, tagged(overloads, { x: (d) => x(d.at), y1: (d) => topOf(d.session) + BAND, y2: (d) => baseOf(d.session), stroke: "var(--bad)", strokeWidth: 1.5,
+            title: (d) => `${nameOf(d)}: overload at ${at(d.at)}, ${duration(d.seconds)}` }, (d) => ({ mark: "overload", session: d.session, at: d.at }))),
+          charts.dot(others, tagged(others, { x: (d) => x(d.at), y: (d) => baseOf(d.session) - VOLUME / 2, symbol: "diamond", r: 4, fill: "var(--ink)",
+            title: (d) => `${nameOf(d)}: ${named(d.kind)} at ${at(d.at)}` }, (d) => ({ mark: "issue", session: d.session, kind: named(d.kind) }))),
+          charts.ruleX(felt, tagged(felt, { x: (d) => x(d.at), y1: hapticsTop + LABEL, y2: hapticsTop + LABEL + 16, stroke: "var(--c4)", strokeOpacity: 0.7,
+            title: (d) => `${named(d.application)}: ${duration(d.seconds)} at ${at(d.at)}` }, (d) => ({ mark: "haptics", at: d.at }))),
+          charts.text(labels, { frameAnchor: "left", y: "y", text: (d) => shortened(d.text, letters), textAnchor: "start", dx: 2, fill: "var(--ink)", stroke: "var(--page)", strokeWidth: 4 }),
+        ],
+      });
+      svg.dataset.from = from;
+      svg.dataset.until = until;
+      svg.dataset.left = margin.left;
+      svg.dataset.right = width - margin.right;
+      return svg;
+    }
+
+    const made = figure({
+      id: "timeline", title, columns, rows: sessions, draw,
+      about: `The band on top of a lane is the device, the line and the area under it the volume from silent to full. A grey line lasts as long as the session is open.`,
+      legendOf: [...deviceLegend(stretches), ["volume", "var(--ink)", "thin"], ["ringer on", "var(--bell)", "thin"], ["input", "var(--input)", "thin"], ["overload", "var(--bad)", "tick"],
+        ...(issues.some(({ kind }) => kind !== "overload") ? [["other issue (diamond)", "var(--ink)", "tick"]] : []), ...(haptics.length ? [["haptics", "var(--c4)", "tick"]] : [])],
+    });
+    const picture = pictures[pictures.length - 1];
+    const box = picture.box;
+    const says = el("span", { "aria-live": "polite", class: "shows" });
+    box.classList.add("zoomable");
+    box.tabIndex = 0;
+    box.setAttribute("role", "group");
+    box.setAttribute("aria-label", "Timeline. Plus and minus zoom, the arrow keys move, 0 shows everything.");
+
+    // The zoom moves over the plain picture's pixels; its transform and `shown` say the same.
+    const zoom = charts.zoom().scaleExtent([1, 20000]);
+    const target = select(box);
+    let waits = false;
+    const inner = () => Math.max(50, (picture.width ?? 600) - margin.left - margin.right);
+    const describe = () => {
+      const span = all[1] - all[0];
+      says.classList.toggle("hint", shown[1] - shown[0] > 0.999);
+      says.textContent = shown[1] - shown[0] > 0.999 ? "Shows everything." : `Shows ${between(all[0] + shown[0] * span, all[0] + shown[1] * span)}.`;
+    };
+    const setTransform = () => {
+      const scale = 1 / (shown[1] - shown[0]);
+      const begin = margin.left + shown[0] * inner();
+      target.property("__zoom", charts.zoomIdentity.translate(margin.left - scale * begin, 0).scale(scale));
+    };
+    const redraw = picture.redraw;
+    picture.redraw = (width) => {
+      picture.width = width - 10; // the box's border and padding
+      zoom.extent([[margin.left, 0], [margin.left + inner(), 1]]).translateExtent([[margin.left, 0], [margin.left + inner(), 1]]);
+      setTransform();
+      describe();
+      return redraw(picture.width);
+    };
+    zoom.filter((event) => (event.type === "wheel" ? event.ctrlKey || event.metaKey || document.activeElement === box : !event.button));
+    zoom.on("zoom", ({ transform }) => {
+      const places = [margin.left, margin.left + inner()].map((place) => (transform.invertX(place) - margin.left) / inner());
+      shown = [Math.max(0, places[0]), Math.min(1, places[1])];
+      if (waits) return;
+      waits = true;
+      requestAnimationFrame(() => {
+        waits = false;
+        describe();
+        redraw(picture.width);
+      });
+    });
+    target.call(zoom);
+    const by = (factor) => zoom.scaleBy(target, factor);
+    const move = (part) => zoom.translateBy(target, -part * inner() * (shown[1] - shown[0]), 0);
+    const show = (from, until) => {
+      shown = [Math.max(0, from), Math.min(1, until)];
+      setTransform();
+      describe();
+      redraw(picture.width);
+    };
+    box.addEventListener("keydown", (event) => {
+      const keys = { "+": () => by(1.6), "=": () => by(1.6), "-": () => by(1 / 1.6), ArrowLeft: () => move(-0.25), ArrowRight: () => move(0.25), 0: () => show(0, 1), Home: () => show(0, 1) };
+      if (event.ctrlKey || event.metaKey || event.altKey || !keys[event.key]) return;
+      event.preventDefault();
+      keys[event.key]();
+    });
+    const button = (text, label, act) => {
+      const pressed = el("button", { type: "button", "aria-label": label }, text);
+      pressed.addEventListener("click", act);
+      return pressed;
+    };
+    const tools = el("div", { class: "tools" }, button("+", "Zoom in", () => by(1.6)), button("−", "Zoom out", () => by(1 / 1.6)),
+      button("◀", "Earlier", () => move(-0.5)), button("▶", "Later", () => move(0.5)), button("All", "Show everything", () => show(0, 1)));
+    const span = all[1] - all[0];
+    if (span > 2 * 86400) tools.append(button("Last day", "Show the last day", () => show(1 - (86400 + pad) / span, 1)));
+    if (!session && sessions.length > 1) {
+      const choice = el("select", { id: "lanes" }, el("option", { value: "application" }, "application"), el("option", { value: "session" }, "session"));
+      choice.value = mode;
+      choice.addEventListener("change", () => {
+        mode = choice.value;
+        note();
+        redraw(picture.width);
+      });
+      tools.append(el("label", { for: "lanes" }, "A lane for each "), choice);
+    }
+    tools.append(says);
+    box.before(tools);
+    const left = el("p", { class: "quiet left-out" });
+    const note = () => {
+      const out = data.timeline.leftOut;
+      const missing = [];
+      const laned = sum(lanesOf(sessions, mode), (lane) => lane.sessions.length);
+      const unseen = out.sessions + sessions.length - laned;
+      if (unseen > 0) missing.push(`${many(unseen, "session", "sessions")} that played and overloaded less than those shown`);
+      if (out.stretches > 0) missing.push(`${many(out.stretches, "short stretch", "short stretches")}`);
+      if (out.issues > 0) missing.push(`${many(out.issues, "short issue", "short issues")}`);
+      if (out.haptics > 0) missing.push(`${many(out.haptics, "short haptic event", "short haptic events")}`);
+      left.textContent = missing.length ? `Left out of the lanes: ${missing.join(", ")}. All other numbers on the page count them.` : "";
+    };
+    note();
+    box.after(left);
+    box.after(el("p", { class: "quiet hint" }, "Zoom: the wheel after a click or with Ctrl, two fingers, or + and −. Move: drag, or the arrow keys."));
+    return made;
+  }
+
+  // ---- Loudness by hour
+
+  const MOST_DAYS = 92; // as in ReportData.h, like the other limits
+  const STEPS = [0.2, 0.35, 0.5, 0.65, 0.8];
+  function heatMap() {
+    const DAY = 86400000;
+    const cells = data.hours.map(([from, seconds, volume]) => {
+      const clock = local(from);
+      return { from, seconds, volume, hour: clock.getUTCHours(), day: new Date(Math.floor(clock / DAY) * DAY) };
+    });
+    const title = "Loudness by hour and day";
+    if (cells.length === 0) return figure({ id: "heat", title, emptyText: "Nothing was played in this time, so there is no loudness to show." });
+    const known = cells.filter(({ volume }) => volume !== null);
+    const days = [cells[0].day, new Date(+cells[cells.length - 1].day + DAY)];
+    const several = (days[1] - days[0]) / DAY;
+    const names = ["below 20 %", "20 to 35 %", "35 to 50 %", "50 to 65 %", "65 to 80 %", "80 % and more"];
+    return figure({
+      id: "heat", title, about: "The average volume of what was played in each hour of the device's clock, weighted by its seconds. An empty cell: nothing was played." + (data.until - data.from > MOST_DAYS * 86400 ? ` The picture has the last ${MOST_DAYS} days.` : ""),
+      legendOf: names.map((name, i) => [name, `var(--h${i + 1})`]), rows: cells,
+      columns: [["Hour", (row) => atMinute(row.from)], ["Average volume", (row) => percent(row.volume), true], ["Played", (row) => duration(row.seconds), true]],
+      draw: (width) => plot({
+        width: Math.min(width, 60 + several * 90), height: 24 * (isPrinting ? 8 : 11) + 34, marginLeft: 44, marginRight: 8, marginTop: 6, marginBottom: 28,
+        x: { type: "utc", domain: days, label: null, ...(several <= width / 110 ? { ticks: "day", tickFormat: (day) => shortDayText.format(day) } : { ticks: Math.max(2, Math.round(width / 110)) }) },
+        y: { domain: [0, 24], range: [6, 6 + 24 * (isPrinting ? 8 : 11)], ticks: [0, 6, 12, 18, 24], tickFormat: (hour) => `${hour}:00`, label: null },
+        color: { type: "threshold", domain: STEPS, range: names.map((_, i) => `var(--h${i + 1})`) },
+        marks: [
+          charts.gridY([0, 6, 12, 18, 24], { stroke: "var(--line)", strokeOpacity: 1 }),
+          charts.rect(known, tagged(known, { x1: "day", x2: (d) => new Date(+d.day + DAY), y1: "hour", y2: (d) => d.hour + 1, fill: "volume", inset: 0.5, rx: 1.5,
+            title: (d) => `${atMinute(d.from)}: ${percent(d.volume)} on average, ${duration(d.seconds)} played` }, (d) => ({ mark: "cell", from: d.from, volume: d.volume }))),
+        ],
+      }),
+    });
+  }
+
+  // ---- Time by application, device and volume
+
+  // The unit in which bars of these seconds are easy to read.
+  function unitFor(seconds) {
+    if (seconds >= 2 * 3600) return { seconds: 3600, name: "hours" };
+    return seconds >= 120 ? { seconds: 60, name: "minutes" } : { seconds: 1, name: "seconds" };
+  }
+
+  // bars: [{name, parts: [{device, seconds}], seconds}], longest first
+  function barFigure({ id, title, about, bars, columns, rows, emptyText, legendOf }) {
+    if (bars.length === 0) return figure({ id, title, emptyText });
+    const parts = bars.flatMap(({ name, parts: all }) => all.map((part) => ({ ...part, name })));
+    const longest = Math.max(...bars.map(({ seconds }) => seconds), 0.001);
+    const unit = unitFor(longest);
+    return figure({
+      id, title, about, columns, rows, legendOf,
+      draw(width) {
+        const left = Math.min(170, Math.max(96, width * 0.28));
+        return plot({
+          width, height: bars.length * 28 + 40, marginLeft: left, marginRight: 84, marginTop: 4, marginBottom: 34,
+          x: { domain: [0, longest / unit.seconds], label: unit.name, ticks: Math.max(2, Math.round((width - left - 84) / 70)), labelArrow: "none" },
+          y: { type: "band", domain: bars.map(({ name }) => name), label: null, tickFormat: (name) => shortened(name, Math.floor(left / 7.2)), tickSize: 0, padding: 0.25 },
+          marks: [
+            charts.gridX({ stroke: "var(--line)", strokeOpacity: 1 }),
+            charts.barX(parts, tagged(parts, { x: (d) => d.seconds / unit.seconds, y: "name", fill: (d) => d.colour ?? colourOf(d.device), title: (d) => `${d.name}${d.device === undefined ? "" : `, ${named(d.device)}`}: ${duration(d.seconds)}` },
+              (d) => ({ mark: "bar", name: d.name, seconds: d.seconds }))),
+            charts.text(bars, { x: (d) => d.seconds / unit.seconds, y: "name", text: (d) => duration(d.seconds), textAnchor: "start", dx: 5, fill: "var(--ink)", stroke: "var(--page)", strokeWidth: 4 }),
+          ],
+        });
+      },
+    });
+  }
+
+  function byApplication() {
+    const { top, rest } = data.playing.byApplication;
+    const rows = rowsOf(top);
+    const onDevices = rowsOf(data.playing.onDevices);
+    const bars = rows.map(({ name, seconds }) => {
+      const parts = onDevices.filter(({ application }) => application === name).map(({ device, seconds: part }) => ({ device, seconds: part }));
+      const unnamed = seconds - sum(parts, (part) => part.seconds);
+      if (unnamed > 0.01) parts.push({ device: "other devices", seconds: unnamed });
+      return { name: named(name), seconds, parts };
+    });
+    if (rest.names > 0) bars.push({ name: many(rest.names, "other", "others"), seconds: rest.seconds, parts: [{ seconds: rest.seconds, colour: "var(--c8)" }] });
+    return barFigure({
+      id: "by-application", title: "Time by application", about: "How long each application played, and on which devices.", bars, rows, legendOf: deviceLegend(onDevices),
+      columns: [["Application", (row) => named(row.name)], ["Played", (row) => duration(row.seconds), true], ["Average volume", (row) => percent(row.averageVolume), true], ["Sessions", (row) => count(row.sessions), true]],
+      emptyText: "No application played in this time.",
+    });
+  }
+
+  function byDevice() {
+    const { rest } = data.playing.byDevice;
+    const bars = played.map(({ name, seconds }) => ({ name: named(name), seconds, parts: [{ device: name, seconds }] }));
+    if (rest.names > 0) bars.push({ name: many(rest.names, "other", "others"), seconds: rest.seconds, parts: [{ seconds: rest.seconds, colour: "var(--c8)" }] });
+    return barFigure({
+      id: "by-device", title: "Time by device", about: "How long each device played.", bars, rows: played,
+      columns: [["Device", (row) => named(row.name)], ["Played", (row) => duration(row.seconds), true], ["Average volume", (row) => percent(row.averageVolume), true], ["Sessions", (row) => count(row.sessions), true]],
+      emptyText: "No device played in this time.",
+    });
+  }
+
+  // Bars side by side. columnsOf: rows with from, until (numbers or dates), or a name for each.
+  function columnFigure({ id, title, about, rows, value, x, columns, emptyText, ordinal, colour = "var(--c1)", label, yLabel, shares, counts }) {
+    if (rows.length === 0) return figure({ id, title, about: null, emptyText });
+    const greatest = Math.max(...rows.map(value), shares ? 0.01 : 1);
+    const ticks = counts ? Math.min(4, greatest) : 4;
+    return figure({
+      id, title, about, columns, rows,
+      draw: (width) => plot({
+        width: ordinal ? Math.min(width, 70 + rows.length * 110) : width, height: 210, marginLeft: 52, marginRight: 10, marginTop: 22, marginBottom: 38,
+        x: { label, labelArrow: "none", ...x(width) },
+        y: { domain: [0, greatest], ticks, label: yLabel, labelArrow: "none", ...(shares ? { tickFormat: percent } : {}) },
+        marks: [
+          charts.gridY({ ticks, stroke: "var(--line)", strokeOpacity: 1 }),
+          ordinal
+            ? charts.barY(rows, tagged(rows, { x: ordinal, y: value, fill: colour, title: (d) => columns.map(([heading, cell]) => `${heading}: ${cell(d)}`).join(", ") }, (d) => ({ mark: "column", value: value(d) })))
+            : charts.rectY(rows, tagged(rows, { x1: "from", x2: "until", y: value, fill: colour, insetLeft: 0.5, insetRight: 0.5, title: (d) => columns.map(([heading, cell]) => `${heading}: ${cell(d)}`).join(", ") }, (d) => ({ mark: "column", value: value(d) }))),
+          ordinal && rows.length <= 12 ? charts.text(rows, { x: ordinal, y: value, text: (d) => (shares ? percent(value(d)) : count(value(d))), dy: -8, fill: "var(--ink)" }) : null,
+          charts.ruleY([0], { stroke: "var(--quiet)" }),
+        ],
+      }),
+    });
+  }
+
+  function byVolume() {
+    const raw = rowsOf(data.playing.byVolume);
+    const unit = unitFor(Math.max(0, ...raw.map(({ seconds }) => seconds)));
+    const rows = raw.map((row) => ({ ...row, from: Math.max(-0.02, (row.sixteenths - 0.5) / 16), until: Math.min(1.03, (row.sixteenths + 0.5) / 16) }));
+    return columnFigure({
+      id: "by-volume", title: "Time by volume", about: "How long was played at each volume, in steps of a sixteenth.", rows, value: (row) => row.seconds / unit.seconds,
+      x: () => ({ domain: [-0.02, 1.04], ticks: [0, 0.25, 0.5, 0.75, 1], tickFormat: percent }), label: "volume", yLabel: unit.name,
+      columns: [["Volume", (row) => percent(row.sixteenths / 16), true], ["Played", (row) => duration(row.seconds), true]], emptyText: "No volume was reported in this time.",
+    });
+  }
+
+  // ---- Overloads
+
+  function overloadsOverTime() {
+    const step = data.issues.stepSeconds;
+    const rows = rowsOf(data.issues.overTime).map((row) => ({ ...row, from: local(row.at), until: new Date(+local(row.at) + step * 1000) }));
+    const domain = [new Date(Math.min(+local(data.from), ...rows.map(({ from }) => +from))), new Date(Math.max(+local(data.until), ...rows.map(({ until }) => +until)))];
+    return columnFigure({
+      id: "overloads", title: "Overloads over time", about: `How often the audio overloaded in each ${step === 3600 ? "hour" : "day"}.`, rows, value: (row) => row.count, colour: "var(--bad)", counts: true,
+      x: (width) => ({ type: "utc", domain, ticks: Math.max(2, Math.round(width / 110)), tickFormat: tickText((domain[1] - domain[0]) / 1000) }), label: null, yLabel: "overloads",
+      columns: [[step === 3600 ? "Hour" : "Day", (row) => (step === 3600 ? atMinute(row.at) : dayText.format(row.from))], ["Overloads", (row) => count(row.count), true]], emptyText: "The audio did not overload in this time.",
+    });
+  }
+
+  function overloadsByBuffer() {
+    return columnFigure({
+      id: "buffers", title: "Overloads by buffer size", about: "Smaller buffers give shorter delays and less time to fill them.", rows: overloaded, value: (row) => row.count, colour: "var(--bad)", counts: true,
+      ordinal: (row) => (row.frames === null ? UNKNOWN : count(row.frames)), x: () => ({ type: "band", domain: overloaded.map((row) => (row.frames === null ? UNKNOWN : count(row.frames))), padding: 0.3 }), label: "frames in the buffer", yLabel: "overloads",
+      columns: [["Frames", (row) => (row.frames === null ? UNKNOWN : count(row.frames)), true], ["Overloads", (row) => count(row.count), true], ["Together", (row) => duration(row.seconds), true]],
+      emptyText: "The audio did not overload in this time.",
+    });
+  }
+
+  // ---- Drivers
+
+  const MOST_CHANNELS = 12;
+  // The rows of each channel, in their order.
+  function channelsOf(rows) {
+    const channels = new Map();
+    for (const row of rows) {
+      const key = JSON.stringify([row.driver, row.group, row.subgroup, row.name, row.unit]);
+      if (!channels.has(key)) channels.set(key, []);
+      channels.get(key).push(row);
+    }
+    return [...channels.values()];
+  }
+  const channelTitle = (row) => [row.group, row.subgroup, row.name].filter(Boolean).join(" · ") || UNKNOWN;
+
+  function histogram(rows) {
+    const all = sum(rows, (row) => row.hits);
+    const [first] = rows;
+    const bounds = (row) => (row.lower === null || row.upper === null ? UNKNOWN : `${count(row.lower)}–${count(row.upper)}`);
+    return columnFigure({
+      title: channelTitle(first), about: `Driver ${named(first.driver)}${first.unit ? `, in ${first.unit}` : ""}, ${many(all, "count", "counts")}.`, rows, value: (row) => (all ? row.hits / all : 0), shares: true,
+      ordinal: bounds, x: (width) => ({ type: "band", domain: rows.map(bounds), padding: 0.15, tickRotate: rows.length > width / 55 ? -40 : 0 }), label: null, yLabel: "share", colour: "var(--c3)",
+      columns: [[first.unit || "Range", bounds], ["Share", (row) => percent(all ? row.hits / all : 0), true], ["Counted", (row) => count(row.hits), true]],
+    });
+  }
+
+  function states(rows) {
+    const all = sum(rows, (row) => row.residency);
+    const [first] = rows;
+    const palette = rows.map((row, i) => ({ ...row, share: all ? row.residency / all : 0, colour: `var(--c${Math.min(8, i + 1)})` }));
+    return figure({
+      title: channelTitle(first), about: `Driver ${named(first.driver)}: the share of the time in each state.`, rows: palette, legendOf: palette.map((row) => [`${named(row.state)} ${percent(row.share)}`, row.colour]),
+      columns: [["State", (row) => named(row.state)], ["Share", (row) => percent(row.share), true], ["Times entered", (row) => count(row.transitions), true]],
+      draw: (width) => plot({
+        width, height: 64, marginLeft: 14, marginRight: 18, marginTop: 4, marginBottom: 24, x: { domain: [0, 1], ticks: [0, 0.25, 0.5, 0.75, 1], tickFormat: percent, label: null }, y: { axis: null },
+        marks: [charts.barX(palette, tagged(palette, { x: "share", y: () => "", fill: "colour", title: (d) => `${named(d.state)}: ${percent(d.share)}` }, (d) => ({ mark: "state", share: d.share })))],
+      }),
+    });
+  }
+
+  function drivers() {
+    const histograms = channelsOf(rowsOf(data.drivers.buckets)).map(histogram);
+    const all = channelsOf(rowsOf(data.drivers.states)).map(states);
+    const values = rowsOf(data.drivers.values);
+    if (histograms.length + all.length + values.length === 0) return [empty("No driver published counters in this time.")];
+    return [
+      Math.max(histograms.length, all.length) === MOST_CHANNELS ? el("p", { class: "quiet" }, `Shown are the ${MOST_CHANNELS} histograms, and as many states, that counted most.`) : null,
+      el("div", { class: "pair" }, ...histograms, ...all),
+      values.length ? el("figure", {}, el("figcaption", {}, el("h3", {}, "Counters"), el("p", {}, "What drivers counted during sessions, added up.")),
+        table([["Driver", (row) => named(row.driver)], ["Counter", channelTitle], ["Sum", (row) => `${count(row.sum)} ${row.unit ?? ""}`.trim(), true]], values)) : null,
+    ].filter(Boolean);
+  }
+
+  // ---- The rest
+
+  function otherTables() {
+    const parts = [];
+    const haptics = rowsOf(data.haptics);
+    const formats = rowsOf(data.playing.formats);
+    const wrap = (title, about, made) => el("figure", {}, el("figcaption", {}, el("h3", {}, title), about ? el("p", {}, about) : null), made);
+    parts.push(wrap("Haptics by application", "For how long the haptics engine was on.", haptics.length
+      ? table([["Application", (row) => named(row.application)], ["Events", (row) => count(row.count), true], ["Together", (row) => duration(row.seconds), true]], haptics)
+      : empty("The haptics engine was not used in this time.")));
+    parts.push(wrap("Formats", "How long each format was in use.", formats.length
+      ? table([["Device", (row) => named(row.device)], ["Format", (row) => [row.sampleRate ? `${count(row.sampleRate)} Hz` : null, row.channels ? many(row.channels, "channel", "channels") : null, row.format].filter(Boolean).join(", ") || UNKNOWN], ["Time", (row) => duration(row.seconds), true]], formats)
+      : empty("No format was reported in this time.")));
+    return el("div", { class: "pair" }, ...parts);
+  }
+
+  function health() {
+    const made = [el("p", {}, daemonSentence())];
+    const { answers, refused, sinks } = data.daemon;
+    if (!answers) return made;
+    if (sinks.length) made.push(table([["Sink", (row) => row.sink], ["Waiting", (row) => count(row.waiting), true], ["Dropped", (row) => count(row.dropped), true], ["Hangs", (row) => (row.hangs > 0 ? `for ${duration(row.hangs)}` : "no")]], sinks));
+    else made.push(el("p", { class: "quiet" }, "The daemon tells only trusted users how its sinks stand."));
+    if (refused.length) made.push(el("p", {}, "What it refused:"), table([["User", (row) => String(row.user)], ["Of what there was too much", (row) => row.resource], ["Times", (row) => count(row.times), true]], refused));
+    return made;
+  }
+
+  function sessionTables() {
+    const facts = [
+      ["Application", named(session.application)], ["Service", named(session.service)], ["Process", named(session.process)], ["User", session.user === null ? UNKNOWN : String(session.user)],
+      ["Reporter identifier", session.reporter === null ? UNKNOWN : String(session.reporter)], ["Started", at(session.started) || UNKNOWN], ["Ended", session.ended === null ? "it still runs" : `${at(session.ended)}, ${named(session.ending)}`],
+      ["Open for", session.ended === null || session.started === null ? UNKNOWN : duration(session.ended - session.started)], ["Active for", session.activeSeconds === null ? UNKNOWN : duration(session.activeSeconds)],
+      ["Messages", session.messages === null ? UNKNOWN : `${count(session.messages)}, of which ${count(session.redundantMessages)} said nothing new`],
+    ];
+    const stretches = rowsOf(session.played);
+    const inputs = rowsOf(session.heard);
+    const issues = rowsOf(session.issues);
+    const kinds = rowsOf(session.kinds);
+    const part = (title, rows, columns, none, most = 250) => [el("h3", {}, title), rows.length ? table(columns, rows) : empty(none),
+      ...(rows.length === most ? [el("p", { class: "quiet" }, `These are the first ${most}; there may be more.`)] : [])];
+    return [
+      el("h2", {}, "The session"), table([["Fact", (row) => row[0]], ["Value", (row) => row[1]]], facts),
+      el("h2", {}, "What it did"),
+      ...part("What was played", stretches, [["From", (row) => at(row.started)], ["For", (row) => duration(row.seconds), true], ["Device", (row) => named(row.device)], ["Volume", (row) => percent(row.volume), true], ["Ringer", (row) => (row.ringer === 1 ? "on" : "off")]], "It played nothing."),
+      ...part("Inputs", inputs, [["From", (row) => at(row.started)], ["For", (row) => duration(row.seconds), true], ["Device", (row) => named(row.device)], ["Mode", (row) => named(row.mode)]], "It used no input."),
+      ...part("Issues", issues, [["Time", (row) => at(row.at)], ["Kind", (row) => named(row.kind)], ["Where", (row) => row.node ?? ""], ["Lasted", (row) => duration(row.seconds), true], ["Buffer, in frames", (row) => count(row.frames), true]], "It had no issue."),
+      ...part("Messages by kind", kinds, [["Category", (row) => named(row.category)], ["Type", (row) => named(row.type)], ["From", (row) => (row.source === "derived" ? "the daemon" : "the client")], ["Messages", (row) => count(row.count), true], ["First", (row) => at(row.first)], ["Last", (row) => at(row.last)]], "The store has none of its messages.", 60),
+    ];
+  }
+
+  function build() {
+    const parts = [heading(), el("ul", { class: "findings" }, ...findings().map((text) => el("li", {}, text))), numbers()];
+    if (session) {
+      parts.push(el("h2", {}, "Timeline"), timeline(), ...sessionTables());
+      if (totals.overloads > 0) parts.push(el("h2", {}, "Overloads"), overloadsByBuffer());
+    } else {
+      parts.push(el("h2", {}, "Timeline"), timeline(), heatMap(), el("h2", {}, "Where the time went"), byApplication(),
+        el("div", { class: "pair" }, byDevice(), byVolume()), el("h2", {}, "Overloads"), el("div", { class: "pair" }, overloadsOverTime(), overloadsByBuffer()));
+    }
+    parts.push(el("h2", {}, "Drivers"), ...drivers());
+    if (!session) parts.push(el("h2", {}, "Haptics and formats"), otherTables());
+    if (data.daemon) parts.push(el("h2", {}, "The daemon's own health"), ...health());
+    parts.push(el("footer", {}, el("p", {}, `Made by twctl ${data.version ?? ""} from the device's report store. The page needs no network and sends nothing. Pictures: Observable Plot and d3, whose licences are in this file.`)));
+    page.replaceChildren(...parts);
+  }
+
+  let drawnFor = 0;
+  function redrawAll(width) {
+    for (const picture of pictures) picture.redraw(Math.max(240, Math.floor(width ?? picture.box.parentElement.clientWidth)));
+  }
+  build();
+  redrawAll();
+  drawnFor = document.documentElement.clientWidth;
+  let resizing = 0;
+  addEventListener("resize", () => {
+    cancelAnimationFrame(resizing);
+    resizing = requestAnimationFrame(() => {
+      if (document.documentElement.clientWidth === drawnFor) return;
+      drawnFor = document.documentElement.clientWidth;
+      redrawAll();
+    });
+  });
+  // A picture for paper has the paper's width, so that its letters have the size of the text.
+  const PAPER = 690;
+  addEventListener("beforeprint", () => {
+    isPrinting = true;
+    for (const picture of pictures) picture.redraw(picture.box.closest(".pair") ? Math.floor((PAPER - 32) / 2) : PAPER);
+  });
+  addEventListener("afterprint", () => {
+    isPrinting = false;
+    redrawAll();
+  });
+  document.documentElement.dataset.ready = "yes";
+})();
