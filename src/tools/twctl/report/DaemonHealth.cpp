@@ -1,0 +1,75 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "tools/twctl/report/DaemonHealth.h"
+
+#include <chrono>
+#include <optional>
+#include <string>
+#include <system_error>
+#include <utility>
+#include <vector>
+
+#include "protocol/Requests.h"
+#include "protocol/WatchKeys.h"
+#include "tools/twctl/DaemonCalls.h"
+#include "tools/twctl/Tool.h"
+
+namespace tonewerk {
+namespace {
+
+// A page is made without a daemon, too, so nobody waits long for one.
+constexpr std::chrono::seconds kAnswerTimeout{3};
+
+ValueMap noAnswer(const std::string& reason) { return {{"answers", false}, {"reason", reason}}; }
+
+const ValueArray& arrayOf(const ValueMap& map, const SharedString& key) {
+  static const ValueArray kNone;
+  const Value* found = map.find(key);
+  return found == nullptr || found->asArray() == nullptr ? kNone : *found->asArray();
+}
+
+// One row for each thing of which a user was refused more.
+ValueArray refusals(const ValueMap& listing) {
+  std::vector<Value> refused;
+  for (const Value& account : arrayOf(listing, kWatchKeyAccounts)) {
+    if (account.asMap() == nullptr) continue;
+    const Value user = account.asMap()->integer(kWatchKeyUser);
+    for (const Value& resource : arrayOf(*account.asMap(), kWatchKeyResources)) {
+      if (resource.asMap() == nullptr || resource.asMap()->integer(kWatchKeyRefused) == 0) continue;
+      refused.emplace_back(ValueMap{{"user", user},
+                                    {"resource", resource.asMap()->text(kWatchKeyName)},
+                                    {"times", resource.asMap()->integer(kWatchKeyRefused)}});
+    }
+    const std::int64_t lines = account.asMap()->integer(kWatchKeyLinesHeldBack);
+    if (lines > 0) refused.emplace_back(ValueMap{{"user", user}, {"resource", "logLines"}, {"times", lines}});
+  }
+  return ValueArray(std::move(refused));
+}
+
+ValueArray sinksOf(const ValueMap& listing) {
+  std::vector<Value> sinks;
+  for (const Value& sink : arrayOf(listing, kWatchKeySinks)) {
+    if (sink.asMap() == nullptr) continue;
+    sinks.emplace_back(ValueMap{{"sink", sink.asMap()->text(kWatchKeyName)},
+                                {"waiting", sink.asMap()->integer(kWatchKeyWaiting)},
+                                {"dropped", sink.asMap()->integer(kWatchKeyDropped)},
+                                {"hangs", sink.asMap()->number(kWatchKeyHangs)}});
+  }
+  return ValueArray(std::move(sinks));
+}
+
+}  // namespace
+
+ValueMap daemonHealth(const Tool& tool) {
+  DaemonConnection daemon;
+  std::error_code error = daemon.connect(tool.socketPaths());
+  if (error) return noAnswer(error.message());
+  (void)daemon.request(requests::kObserve.name, {}, {});  // an older daemon refuses this and works as before
+  const std::optional<Answer> answer = daemon.call(requests::kWatchAccounts.name, {}, kAnswerTimeout, error);
+  if (!answer) return noAnswer(error.message());
+  if (answer->error) return noAnswer(DaemonCalls::describe(requests::kWatchAccounts.name, *answer->error));
+  const ValueMap* listing = answer->result ? answer->result->asMap() : nullptr;
+  if (listing == nullptr) return noAnswer("its answer is not a listing");
+  return {{"answers", true}, {"refused", refusals(*listing)}, {"sinks", sinksOf(*listing)}};
+}
+
+}  // namespace tonewerk

@@ -1,0 +1,15 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include "values/ValueMap.h"
+
+namespace tonewerk {
+
+struct Tool;
+
+// Asks the daemon for its sinks, and for what it refused its users. Prints nothing. Without an answer the map
+// has `answers` false and the `reason`. Otherwise it has `answers` true, and `refused` and `sinks` as arrays
+// of maps.
+[[nodiscard]] ValueMap daemonHealth(const Tool& tool);
+
+}  // namespace tonewerk
