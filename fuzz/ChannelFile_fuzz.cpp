@@ -13,6 +13,7 @@
 #include "platform/chanmeter/ChanmeterDifference.h"
 #include "platform/chanmeter/ChanmeterRecordSample.h"
 #include "platform/linux/channels/ChannelFile.h"
+#include "tools/twctl/show/ChannelText.h"
 #include "values/Utf8.h"
 
 namespace tonewerk {
@@ -34,6 +35,8 @@ void ask(const ChanmeterSample& sample) {
   }
   for (std::int32_t index = -1; index <= sample.stateCount(); ++index)
     expect(isUtf8(sample.stateName(index)));
+  expect(isUtf8(channelValueText(sample)) && isUtf8(channelFields(sample).text()));
+  (void)isChanged(sample);
 }
 
 // The difference of a file with itself is zero in its simple channels and in its states.
