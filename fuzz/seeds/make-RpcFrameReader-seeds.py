@@ -16,6 +16,7 @@ SEEDS = {
     "nested": "02 02 " + REQUEST_OF_M + "91 82 A1 61 93 C2 80 90 A1 62 81 A1 63 CA 3F800000",
     "deep": "00 02 " + REQUEST_OF_M + "91 " * 29 + "90",
     "refused": "00 02 " + REQUEST_OF_M + "96 C4 02 0102 D4 05 00 D4 FF 00 A1 FF 81 C0 C0 81 91 01 01",
+    "too-many": "00 02 " + REQUEST_OF_M + "DC 0014 " + "05 " * 20,
     "long-forms": "00 00 DD 00000004 D3 0000000000000000 CF 0000000000000001 DB 00000001 6D DC 0001 D9 01 78",
     "claims": "00 00 " + REQUEST_OF_M + "DD FFFFFFFF DF FFFFFFFF DB FFFFFFFF",
     "several": "00 00 " + ("93 02 A1 6D 91 01 " + REQUEST_OF_M + "90 ") * 3,
