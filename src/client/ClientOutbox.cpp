@@ -405,13 +405,17 @@ void ClientOutbox::takeBack(OutgoingFrame frame) {
   if (frame.stateBefore != nullptr) {
     twr_session& session = *frame.command.session;
     session.sent = std::move(*frame.stateBefore);
-    session.starts = frame.startsBefore;
-    const std::size_t waiting = session.starts == nullptr ? 0 : session.starts->waiting.size();
-    if (waiting > frame.startCountBefore) {
-      session.starts->waiting.resize(frame.startCountBefore);
-    } else if (frame.startsBefore != nullptr && frame.command.reply.isStart) {
-      frame.command.reply = {};  // called already, with the replies that it waited with
+    // The caller of a start waits with others, unless the daemon has answered what it cannot have read. The
+    // reply was called then.
+    if (frame.command.reply.isStart) {
+      std::vector<PendingReply>& waiting = session.starts->waiting;
+      if (waiting.size() > frame.startCountBefore) {
+        waiting.resize(frame.startCountBefore);
+      } else {
+        frame.command.reply = {};
+      }
     }
+    session.starts = frame.startsBefore;
   }
   if (frame.origin == OutgoingFrame::Origin::kRing) {
     frame.command.bytes = bytesOf(frame.command.body.size(), 1);

@@ -331,6 +331,24 @@ TEST_F(ClientOutboxTest, CallsAReplyOnceWhenTheDaemonAnswersWhatItCannotHaveRead
   EXPECT_THAT(told(), IsEmpty());
 }
 
+// The answer to the end of a run answers the start, too.
+TEST_F(ClientOutboxTest, CallsAStartsReplyOnceWhenTheDaemonAnswersAnEndThatItCannotHaveRead) {
+  const auto one = session();
+  outbox->connected();
+  sayAll();
+  change(*one, make(Kind::kStart), reply("start"));
+  destroy(*one, reply("destroy"));
+  for (const RpcFrame& frame : framesOf(outbox->unsent())) {
+    if (frame.kind == RpcFrame::Kind::kRequest) requests[frame.method] = frame.identifier;
+  }
+  answer("destroyReportingSession");
+  EXPECT_THAT(told(), ElementsAre("start: done", "destroy: done"));
+  reconnect();
+  sayAll();
+  outbox->end();
+  EXPECT_THAT(told(), IsEmpty());
+}
+
 // Otherwise a queue of small requests would take a multiple of its bound.
 TEST_F(ClientOutboxTest, CountsTheMemoryOfWhatWaitsAndNotOnlyItsBytes) {
   const auto one = session();
