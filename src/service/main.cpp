@@ -35,7 +35,6 @@
 #include "platform/linux/directories/Directories.h"
 #include "platform/linux/directories/SocketPaths.h"
 #include "platform/linux/journal/BatchedJournal.h"
-#include "platform/linux/journal/JournalPlayer.h"
 #include "platform/linux/journal/PlayedClock.h"
 #include "platform/linux/journal/RecoveryAttempts.h"
 #include "platform/linux/journal/SegmentJournal.h"
@@ -57,6 +56,7 @@
 #include "platform/linux/tracing/Tracing.h"
 #include "platform/linux/tracing/TracingSetup.h"
 #include "protocol/Requests.h"
+#include "recovery/SessionRecovery.h"
 #include "service/JournalUpkeep.h"
 #include "service/TWReportingClientServerInstance.h"
 #include "service/TWReportingService.h"
@@ -136,7 +136,6 @@ class RecoveryProgress {
     loggedAt_ = now;
     defaultLog(log_, "recovering sessions: %llu requests so far", records);
   }
-  double seconds() const { return std::chrono::duration<double>(Time::clock::now() - began_).count(); }
 
  private:
   using Time = std::chrono::steady_clock::time_point;
@@ -145,9 +144,8 @@ class RecoveryProgress {
 
   const ServiceManager& manager_;
   const LogCategory& log_;
-  const Time began_ = Time::clock::now();
-  Time toldAt_ = began_ - kTellEvery;  // at once, because one request may take long
-  Time loggedAt_ = began_;
+  Time loggedAt_ = Time::clock::now();
+  Time toldAt_ = loggedAt_ - kTellEvery;  // at once, because one request may take long
 };
 
 // Holds the daemon's parts, in the order in which they depend on each other.
@@ -256,50 +254,17 @@ class Daemon {
   }
 
  private:
-  // Plays what the last daemon's clients asked for when it did not end in order, so that their sessions are
-  // reported as if it had.
   void recover() {
-    std::optional<StoreMarks> marks = store_.marks();
-    if (!marks) marks.emplace();  // rather twice than never
-    for (const auto& [user, row] : *marks) journal_.continueAfter(row.sequence);
-    if (journal_.bytes() == 0) return;
-    attempts_.begin();
-    store_.beginPlaying(std::move(*marks));
-    context_.reportingServerQueue().async([this] { playJournal(); });
-    context_.reportingServerQueue().drain();
-    store_.endRecovery();
-    attempts_.finish();
-    // Otherwise the next start plays the same again, and leaves out what is written.
-    const bool isLost = store_.status().dropped > 0 || context_.fileSinkQueue().status().dropped > 0;
-    if (areReportsWritten() && !isLost) journal_.clear();
-  }
-
-  // On the work queue.
-  void playJournal() {
-    RecoveryProgress progress(manager_, log_);
-    JournalPlayer player(
-        journal_, *service_, linux_.accounts(),
-        {.begins = [this](const Journal::Record& record) { context_.journal().play(record); },
-         .endSingleMessages = [this](std::uint32_t user) { service_->stopSingleMessageSession(user); },
-         .progress = [&progress](std::uint64_t records) { progress.played(records); }});
-    const Journal::Reading reading = player.play();
-    const std::size_t clients = player.openClients();
-    const bool hasSingleMessages = !service_->currentSingleMessageSessions().empty();
-    context_.journal().endPlaying();
-    store_.endPlaying();
-    player.endAll();
-    service_->stopSingleMessageSessions();
-    context_.journal().endRecovery();
-    if (clients > 0 || hasSingleMessages) {
-      defaultLog(log_,
-                 "the last daemon did not end in order: sessions of %zu clients recovered from %llu "
-                 "requests in %f s",
-                 clients, reading.records, progress.seconds());
-    }
-    if (reading.damagedPlaces > 0) {
-      errorLog(log_, "the journal is damaged at %llu places: %llu bytes are left out", reading.damagedPlaces,
-               reading.damagedBytes);
-    }
+    SessionRecovery recovery({journal_, attempts_, store_, linux_.accounts(), context_, *service_, log_});
+    if (!recovery.begin(store_.marks())) return;
+    SerialQueue& queue = context_.reportingServerQueue();
+    queue.async([&] {
+      RecoveryProgress progress(manager_, log_);
+      recovery.play([&progress](std::uint64_t requests) { progress.played(requests); });
+    });
+    queue.drain();
+    recovery.end();
+    if (areReportsWritten()) recovery.forget();
   }
 
   // What was answered or stored must be in the journal. It logs a failure, and tries again with the next

@@ -15,13 +15,13 @@
 #include "platform/accounts/TurnQueue.h"
 #include "platform/linux/files/LinuxFileSystem.h"
 #include "platform/linux/journal/BatchedJournal.h"
-#include "platform/linux/journal/JournalPlayer.h"
 #include "platform/linux/journal/PlayedClock.h"
 #include "platform/linux/journal/RecoveryAttempts.h"
 #include "platform/linux/journal/SegmentJournal.h"
 #include "platform/linux/json/NlohmannJsonService.h"
 #include "platform/linux/store/ReportStore.h"
 #include "platform/linux/store/StoreMetricon.h"
+#include "recovery/SessionRecovery.h"
 #include "service/JournalUpkeep.h"
 #include "service/TWReportingService.h"
 #include "session/TWReportingContext.h"
@@ -153,31 +153,13 @@ class FaultedDaemon {
   }
 
   void recover() {
-    StoreMarks marks = marks_.value_or(StoreMarks());
-    for (const auto& [user, row] : marks) journal_.continueAfter(row.sequence);
-    if (journal_.bytes() == 0) return;
-    attempts_.begin();
-    store_.beginPlaying(std::move(marks));
-    context_.reportingServerQueue().async([this] { playJournal(); });
+    SessionRecovery recovery({journal_, attempts_, store_, test_.accounts, context_, *service_, log_});
+    if (!recovery.begin(marks_)) return;
+    context_.reportingServerQueue().async([&recovery] { recovery.play([](std::uint64_t) {}); });
     run();
-    store_.endRecovery();
-    attempts_.finish();
+    recovery.end();
     run();
-    const bool isLost = store_.status().dropped > 0 || context_.fileSinkQueue().status().dropped > 0;
-    if (flush() && !isLost) journal_.clear();
-  }
-  void playJournal() {
-    JournalPlayer player(
-        journal_, *service_, test_.accounts,
-        {.begins = [this](const Journal::Record& record) { context_.journal().play(record); },
-         .endSingleMessages = [this](std::uint32_t user) { service_->stopSingleMessageSession(user); },
-         .progress = [](std::uint64_t) {}});
-    (void)player.play();
-    context_.journal().endPlaying();
-    store_.endPlaying();
-    player.endAll();
-    service_->stopSingleMessageSessions();
-    context_.journal().endRecovery();
+    if (flush()) recovery.forget();
   }
 
   const std::string directory_;
