@@ -106,7 +106,7 @@ TEST_F(TwctlTest, WrongUsageIsStatusTwo) {
       {"send", "--category", "Playback", "--type", "Start", "no value"},
       {"send", "--category", "Playback", "--type", "Start", "--payload", "[1]"},
       {"replay"},
-      {"events", "--since", "yesterday"},
+      {"events", "--since", "someday"},
       {"events", "--limit", "0"},
       {"defaults"},
       {"defaults", "write", "org.example", "key"},

@@ -112,7 +112,7 @@ void exportView(Tool& tool, const ExportOptions& options) {
 
 void addExportCommand(CLI::App& app, Tool& tool) {
   CLI::App& command = addCommand(app, tool, "export", "Writes a view of the store for other programs");
-  command.footer("`twctl sql` and its .tables show the views. " + std::string(TimeRangeOptions::kForms) +
+  command.footer("`twctl sql` and its .tables show the views.\n" + std::string(TimeRangeOptions::kForms) +
                  "\nThe store is read whether a daemon runs or not.");
   const auto options = std::make_shared<ExportOptions>();
   command.add_option("VIEW", options->view, "The view or table")->required();

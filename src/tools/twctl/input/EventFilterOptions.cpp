@@ -14,7 +14,7 @@ void EventFilterOptions::addTo(CLI::App& command) {
 }
 
 void EventFilterOptions::addWithoutNameTo(CLI::App& command) {
-  command.footer(std::string(TimeRangeOptions::kForms) + " The store is read whether a\ndaemon runs or not.");
+  command.footer(std::string(TimeRangeOptions::kForms) + "\nThe store is read whether a daemon runs or not.");
   range_.addTo(command, "events");
   command.add_option("--limit", limit_, "Only the newest so many")->check(problemWithCount);
 }

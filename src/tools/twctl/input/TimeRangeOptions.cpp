@@ -18,8 +18,10 @@ bool readTime(Tool& tool, const char* option, const std::optional<std::string>& 
       std::chrono::duration<double>(std::chrono::system_clock::now().time_since_epoch()).count();
   time = timeOfArgument(*text, now);
   if (time) return true;
-  tool.status = tool.fail(kWrongUsage, std::string(option) + ": \"" + *text +
-                                           "\" is neither a time as 2026-11-20T10:18:00Z nor a span as 10m");
+  tool.status =
+      tool.fail(kWrongUsage, std::string(option) + ": \"" + *text +
+                                 "\" is neither a time, as 2026-11-20 or \"2026-11-20 10:18\", nor how "
+                                 "long ago, as 10m or \"1 hour ago\"");
   return false;
 }
 
@@ -34,6 +36,11 @@ std::optional<TimeRangeOptions::Range> TimeRangeOptions::range(Tool& tool) const
   Range range;
   if (!readTime(tool, "--since", since_, range.since)) return std::nullopt;
   if (!readTime(tool, "--until", until_, range.until)) return std::nullopt;
+  if (range.since && range.until && *range.since > *range.until) {
+    tool.status =
+        tool.fail(kWrongUsage, "--since: \"" + *since_ + "\" is later than --until, \"" + *until_ + "\"");
+    return std::nullopt;
+  }
   return range;
 }
 

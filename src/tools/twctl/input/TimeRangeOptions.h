@@ -25,12 +25,13 @@ class TimeRangeOptions {
   // `command`.
   void addTo(CLI::App& command, const std::string& what);
 
-  // None when an option is wrong; the problem is then printed.
+  // None when an option is wrong, or the range ends before it begins; the problem is then printed.
   [[nodiscard]] std::optional<Range> range(Tool& tool) const;
 
   // How people write a time, for a footer.
   static constexpr const char* kForms =
-      "A time is as 2026-11-20T10:18:00Z, or how long ago: 90s, 10m, 1.5h, 2d.";
+      "A time is as 2026-11-20, \"2026-11-20 10:18\", 2026-11-20T10:18:00Z, today or yesterday,\n"
+      "or how long ago: 90s, 10m, \"1 hour ago\".";
 
  private:
   std::optional<std::string> since_;

@@ -3,26 +3,13 @@
 
 #include <gtest/gtest.h>
 #include <limits>
-#include <stdlib.h>
-#include <string>
-#include <time.h>
+
+#include "support/ScopedTimeZone.h"
 
 namespace tonewerk {
 namespace {
 
 using std::chrono::minutes;
-
-// Sets the time zone while it exists.
-class ScopedTimeZone {
- public:
-  explicit ScopedTimeZone(const std::string& zone) { setenv("TZ", zone.c_str(), 1); }
-  ScopedTimeZone(const ScopedTimeZone&) = delete;
-  ScopedTimeZone& operator=(const ScopedTimeZone&) = delete;
-  ~ScopedTimeZone() {
-    unsetenv("TZ");
-    tzset();
-  }
-};
 
 constexpr double kWinter = 1'768'478'400.0;  // 2026-01-15T12:00:00Z
 constexpr double kSummer = 1'784'116'800.0;  // 2026-07-15T12:00:00Z

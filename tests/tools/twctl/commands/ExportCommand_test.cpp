@@ -72,6 +72,16 @@ TEST_F(ExportCommandTest, WritesTheRowsOfATime) {
   EXPECT_EQ(run({"export", "--format", "csv", "names", "--since", "1h"}), kWrongUsage);
   EXPECT_EQ(errors(), "twctl: names has no time, so --since and --until do not apply\n");
   EXPECT_EQ(run({"export", "--format", "csv", "event", "--since", "then"}), kWrongUsage);
+  EXPECT_EQ(
+      errors(),
+      "twctl: --since: \"then\" is neither a time, as 2026-11-20 or \"2026-11-20 10:18\", nor how long ago, "
+      "as 10m or \"1 hour ago\"\n");
+}
+
+TEST_F(ExportCommandTest, RefusesARangeThatEndsBeforeItBegins) {
+  EXPECT_EQ(run({"export", "--format", "csv", "event", "--since", "1h", "--until", "2h"}), kWrongUsage);
+  EXPECT_EQ(errors(), "twctl: --since: \"1h\" is later than --until, \"2h\"\n");
+  EXPECT_EQ(output(), "");
 }
 
 TEST_F(ExportCommandTest, NamesTheNearestViewAndAllOthers) {
