@@ -41,6 +41,8 @@
 namespace tonewerk {
 namespace reporting {
 
+class AudioUse;  // of tonewerk/reporting_audio.hpp
+
 enum class Status {
   kOk = TWR_OK,
   kInvalid = TWR_INVALID,
@@ -531,6 +533,7 @@ class Session {
   }
 
  private:
+  friend class AudioUse;
   friend class Sender;
 
   std::shared_ptr<detail::SessionHandle> handle_;

@@ -7,6 +7,7 @@
 #include <memory>
 #include <vector>
 
+#include "client/AudioActivity.h"
 #include "client/MessageRing.h"
 #include "client/ReplyTable.h"
 #include "client/SessionState.h"
@@ -20,7 +21,7 @@ struct Command;
 // The object behind a caller's pointer to a session, with what the client knows of the session. After its
 // caller has destroyed it, it is kept until the daemon was told so.
 //
-// Everything but `engine`, `identifier` and `losses` is guarded by the engine's mutex.
+// Everything but `engine`, `identifier`, `losses` and `activity` is guarded by the engine's mutex.
 struct twr_session : std::enable_shared_from_this<twr_session> {  // NOLINT(readability-identifier-naming)
   twr_session(tonewerk::ClientEngine& client, std::int64_t reporterID)
       : engine(client), identifier(reporterID) {}
@@ -37,6 +38,7 @@ struct twr_session : std::enable_shared_from_this<twr_session> {  // NOLINT(read
   std::shared_ptr<tonewerk::StartReplies> starts;
 
   tonewerk::LossCount losses;
+  tonewerk::AudioActivity activity;
   tonewerk::ReportedLosses reported;
   std::size_t queued = 0;  // commands that wait in the queue
   std::size_t unsent = 0;  // frames that are being sent
@@ -49,10 +51,11 @@ struct twr_session : std::enable_shared_from_this<twr_session> {  // NOLINT(read
 // The object behind a real-time thread's pointer to a sender.
 struct twr_sender {  // NOLINT(readability-identifier-naming)
   twr_sender(const std::shared_ptr<twr_session>& owner, const std::atomic<bool>& isForked, std::size_t bytes)
-      : session(owner), hasForked(isForked), ring(bytes, owner->losses) {}
+      : session(owner), hasForked(isForked), activity(owner->activity), ring(bytes, owner->losses) {}
 
   const std::weak_ptr<twr_session> session;
   const std::atomic<bool>& hasForked;
+  tonewerk::AudioActivity& activity;  // the session's
   tonewerk::MessageRing ring;
   // The engine's mutex guards these two.
   bool isClosed = false;

@@ -18,6 +18,7 @@
 #include "client/ClientRegistry.h"
 #include "client/MessageFrame.h"
 #include "client/Payload.h"
+#include "client/SessionActivity.h"
 #include "platform/linux/messagepack/RpcLimits.h"
 #include "platform/linux/messagepack/RpcWriter.h"
 #include "protocol/Requests.h"
@@ -281,6 +282,7 @@ twr_status twr_session_send(twr_session* session, uint32_t category, uint16_t ty
 }
 
 twr_status twr_session_stop(twr_session* session, twr_reply reply, void* context) {
+  if (session != nullptr) endActivity(*session);
   return change(session, {Kind::kStop, TWR_SERVICE_UNKNOWN, {}}, {reply, context});
 }
 
@@ -288,6 +290,7 @@ twr_status twr_session_destroy(twr_session* session, twr_reply reply, void* cont
   if (session == nullptr) return TWR_INVALID;
   // In a forked child the copy is kept until the copy of its client is destroyed.
   if (session->engine.hasForked()) return TWR_FORKED;
+  endActivity(*session);
   return guarded([&] {
     return session->engine.withOutbox([&](ClientOutbox& outbox) {
       return outbox.destroy(*session, {reply, context});

@@ -45,6 +45,16 @@ TEST_F(TrappedSenderTest, MakesNoSystemCall) {
   expectSent(result);
 }
 
+TEST_F(TrappedSenderTest, NeitherAllocatesNorLocksToSayWhatTheAudioDoes) {
+  EXPECT_EQ(run("say", false).output, "taken 10000 dropped 0\n");
+}
+
+TEST_F(TrappedSenderTest, MakesNoSystemCallToSayWhatTheAudioDoes) {
+  const BoundedCommand::Result result = run("say", true);
+  if (!isPermitted(result)) GTEST_SKIP() << "no system call was trapped, seccomp: " << result.output;
+  EXPECT_EQ(result.output, "taken 10000 dropped 0\n");
+}
+
 TEST_F(TrappedSenderTest, WouldBeCaughtMakingASystemCall) {
   const BoundedCommand::Result result = run("getppid", true);
   if (!isPermitted(result)) GTEST_SKIP() << "no system call was trapped, seccomp: " << result.output;

@@ -2,6 +2,7 @@
 // Compiled as C++17 and as C++20: the C++ interface as other programs include it, with every template in use.
 #include <string>
 #include <tonewerk/reporting.hpp>
+#include <tonewerk/reporting_audio.hpp>
 #include <type_traits>
 #include <utility>
 
@@ -12,6 +13,7 @@ constexpr bool isMoveOnly = std::is_nothrow_move_constructible_v<T>&& std::is_no
                             !std::is_copy_constructible_v<T> && !std::is_copy_assignable_v<T>;
 static_assert(isMoveOnly<reporting::Client> && isMoveOnly<reporting::Session> &&
               isMoveOnly<reporting::Sender>);
+static_assert(isMoveOnly<reporting::Playing> && isMoveOnly<reporting::RecordingInput>);
 static_assert(!std::is_copy_constructible_v<reporting::Payload<>>);
 static_assert(reporting::Category::kIO != (reporting::Category::kIO | reporting::Domain::kHAL));
 
@@ -33,6 +35,17 @@ int tonewerkCxxHeader() {
   parameters.putNil().put(1);
   client.request("method", parameters, [](reporting::Answer answer) { answer.result.clear(); });
   session.start([](const reporting::Answer& answer) { static_cast<void>(answer.status); });
+  {
+    reporting::Playing playing(sender, 0.5);
+    playing.setVolume(0.25);
+    reporting::RecordingInput recording(session);
+    recording = reporting::RecordingInput(sender);
+    reporting::reportDevice(session, "Speaker");
+    reporting::reportRoute(sender, "Headphones", "plugged");
+    reporting::reportFormat(session, 48000, 2, "lpcm");
+    reporting::reportOverload(sender, {"mixer", 0.5, 512, 7});
+    reporting::reportOverload(session);
+  }
   reporting::Sender moved = std::move(sender);
   session.destroy();
   return moved && !session && client ? 0 : 1;

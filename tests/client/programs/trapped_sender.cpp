@@ -6,7 +6,8 @@
 //
 //   trapped_sender ACTION [without-system-calls]
 //
-// ACTION is "send", or a forbidden action, which the thread does once between messages.
+// ACTION is "send", "say" (which says what the audio does), or a forbidden action, which the thread does
+// once between messages.
 
 #include <array>
 #include <cstdint>
@@ -31,11 +32,14 @@
 #include "platform/linux/descriptors/FileDescriptor.h"
 #include "platform/linux/descriptors/UnixAddress.h"
 #include "tonewerk/reporting.h"
+#include "tonewerk/reporting_audio.h"
 
 namespace {
 
 constexpr std::uint32_t kMessages = 100'000;
 constexpr std::size_t kRingBytes = 4096;  // is full long before the background thread reads it again
+constexpr std::uint32_t kCycles = 1000;
+constexpr std::uint32_t kMessagesOfACycle = 10;
 constexpr int kPatienceMs = 30'000;
 
 // Exit statuses.
@@ -59,6 +63,7 @@ const std::map<std::string, std::function<void()>>& forbiddenActions() {
   sem_init(&semaphore, 0, 1);
   static const std::map<std::string, std::function<void()>> all = {
       {"send", [] {}},
+      {"say", [] {}},
       {"malloc", [] { allocatedMemory = std::malloc(16); }},
       {"calloc", [] { allocatedMemory = std::calloc(1, 16); }},
       {"realloc", [] { allocatedMemory = std::realloc(memory, 32); }},
@@ -107,6 +112,7 @@ class Reader {
 struct Run {
   twr_sender* sender = nullptr;
   const std::function<void()>* forbiddenAction = nullptr;
+  bool says = false;
   bool forbidsSystemCalls = true;
   int problem = 0;  // the errno when they cannot be forbidden
   std::uint64_t sent = 0;
@@ -137,14 +143,45 @@ void sendOne(Run& run, std::uint32_t number) {
   }
 }
 
+// Calls every function that says what the audio does. The ring has room for all messages.
+void sayAll(Run& run) {
+  const auto note = [&](twr_status status, std::uint64_t messages = 1) {
+    (status == TWR_OK ? run.sent : run.dropped) += messages;
+  };
+  twr_overload overload{};
+  overload.size = sizeof(overload);
+  overload.node = "mixer";
+  overload.silence_seconds = 0.5;
+  overload.buffer_frames = 512;
+  for (overload.io_cycle = 1; overload.io_cycle <= kCycles; ++overload.io_cycle) {
+    note(twr_sender_device(run.sender, "Speaker"));
+    note(twr_sender_route(run.sender, "Kopfh\xC3\xB6rer", "plugged"));
+    note(twr_sender_format(run.sender, 48000, 2, "lpcm"));
+    note(twr_sender_playing(run.sender, 0.5), 2);
+    note(twr_sender_recording(run.sender));
+    note(twr_sender_volume(run.sender, 0.25));
+    note(twr_sender_overload(run.sender, &overload));
+    note(twr_sender_playing_stopped(run.sender));
+    note(twr_sender_recording_stopped(run.sender));
+  }
+}
+
+void sendEach(Run& run) {
+  for (std::uint32_t number = 0; number < kMessages; ++number) {
+    if (number == kMessages / 2) (*run.forbiddenAction)();
+    sendOne(run, number);
+  }
+}
+
 void* sendAll(void* given) {
   Run& run = *static_cast<Run*>(given);
   if (run.forbidsSystemCalls) run.problem = traps_forbid_system_calls();
   if (run.problem == 0) {
     traps_begin();
-    for (std::uint32_t number = 0; number < kMessages; ++number) {
-      if (number == kMessages / 2) (*run.forbiddenAction)();
-      sendOne(run, number);
+    if (run.says) {
+      sayAll(run);
+    } else {
+      sendEach(run);
     }
     traps_end();
   }
@@ -168,7 +205,8 @@ bool isAccountedFor(const Run& run, twr_client* client) {
   }
   // One more message may report losses that no later message has reported.
   const bool isSent = info.messages_sent == run.sent || info.messages_sent == run.sent + 1;
-  return isSent && info.messages_dropped == run.dropped && run.sent + run.dropped == kMessages;
+  const std::uint64_t messages = run.says ? std::uint64_t{kCycles} * kMessagesOfACycle : kMessages;
+  return isSent && info.messages_dropped == run.dropped && run.sent + run.dropped == messages;
 }
 
 int report(const Run& run, twr_client* client) {
@@ -192,7 +230,7 @@ int runAll(Run& run, const std::string& socketPath) {
   options.socket_path = socketPath.c_str();
   twr_client* client = twr_client_create(&options);
   twr_session* session = twr_session_create(client, TWR_NEW_ID);
-  run.sender = twr_sender_open(session, kRingBytes);
+  run.sender = twr_sender_open(session, run.says ? TWR_MOST_RING_BYTES : kRingBytes);
   pthread_t thread{};
   if (!reader.isListening() || twr_client_connect(client, kPatienceMs) != TWR_OK || run.sender == nullptr ||
       pthread_create(&thread, nullptr, sendAll, &run) != 0) {
@@ -213,6 +251,7 @@ int main(int count, char** arguments) {
   if (chosen == all.end()) return kCannot;
   Run run;
   run.forbiddenAction = &chosen->second;
+  run.says = chosen->first == "say";
   run.forbidsSystemCalls = count == 3;
   traps_prepare();
   return runAll(run, arguments[1]);
