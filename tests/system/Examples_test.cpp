@@ -85,5 +85,42 @@ TEST_P(ExamplesTest, EndsWellWithoutADaemon) {
 INSTANTIATE_TEST_SUITE_P(Programs, ExamplesTest, ::testing::Values(TONEWERK_EXAMPLE_C, TONEWERK_EXAMPLE_CXX),
                          [](const auto& tested) { return std::string(tested.index == 0 ? "C" : "Cxx"); });
 
+class PlayersTest : public DaemonTest, public ::testing::WithParamInterface<const char*> {};
+
+TEST_P(PlayersTest, GetTheirSummariesWithoutAKey) {
+  ASSERT_TRUE(daemon.start());
+  const auto output = outputOfExample(GetParam(), daemon);
+  ASSERT_TRUE(output);
+  EXPECT_EQ(*output, "player: done\n");
+
+  const RecordedEvents recorded(daemon.storePath());
+  const char* end = "com.orvane.longformaudio.Session_Generic.Summary";
+  ASSERT_TRUE(waitUntil([&] { return !recorded.named(end).empty(); }));
+  const std::vector<json> volumes = recorded.named("com.orvane.longformaudio.Volume.Summary");
+  ASSERT_EQ(volumes.size(), 2U);
+  for (const json& volume : volumes) {
+    EXPECT_EQ(volume.at("HostApplicationDisplayID"), "org.example.Player");
+    EXPECT_EQ(volume.at("active_devices"), "Speaker");
+    EXPECT_EQ(volume.at("session_selected_format"), "48000 Hz, 2 ch, lpcm");
+    EXPECT_EQ(volume.at("mFormatID"), "lpcm");
+    EXPECT_EQ(volume.at("mChannelsPerFrame"), 2);
+    EXPECT_GE(volume.at("play_seconds"), 0.74);
+  }
+  EXPECT_EQ(volumes[0].at("QMSessionVolume"), 0.5);
+  EXPECT_EQ(volumes[1].at("QMSessionVolume"), 0.3);
+  const json session = recorded.named(end).front();
+  EXPECT_EQ(session.at("overload_count"), 1);
+  EXPECT_EQ(session.at("active_count"), 1);
+  EXPECT_GE(session.at("total_active_time"), 1.4);
+}
+
+TEST_P(PlayersTest, SayThatThereIsNoDaemon) {
+  const auto output = outputOfExample(GetParam(), daemon);
+  EXPECT_EQ(output.value_or(""), "player: not connected to the daemon\n");
+}
+
+INSTANTIATE_TEST_SUITE_P(Programs, PlayersTest, ::testing::Values(TONEWERK_PLAYER_C, TONEWERK_PLAYER_CXX),
+                         [](const auto& tested) { return std::string(tested.index == 0 ? "C" : "Cxx"); });
+
 }  // namespace
 }  // namespace tonewerk
