@@ -2,7 +2,7 @@
 # steps.
 set(CPACK_GENERATOR DEB)
 set(CPACK_DEB_COMPONENT_INSTALL ON)
-set(CPACK_COMPONENTS_ALL daemon tools development library)
+set(CPACK_COMPONENTS_ALL daemon tools development library python)
 
 set(CPACK_PACKAGE_NAME tonewerk-reporting)
 set(CPACK_PACKAGE_VERSION ${PROJECT_VERSION})
@@ -80,5 +80,17 @@ plays.")
 set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS_PRIVATE_DIRS ${PROJECT_BINARY_DIR}/src)
 set(CPACK_DEBIAN_TOOLS_PACKAGE_DEPENDS "libtwreporting0 ${same_version}, ${curl_package}")
 set(CPACK_DEBIAN_TOOLS_PACKAGE_RECOMMENDS "tonewerk-reporting-daemon")
+
+set(CPACK_DEBIAN_PYTHON_PACKAGE_NAME python3-tonewerk-reporting)
+set(CPACK_DEBIAN_PYTHON_PACKAGE_SECTION python)
+set(CPACK_DEBIAN_PYTHON_PACKAGE_ARCHITECTURE all)
+set(CPACK_DEBIAN_PYTHON_PACKAGE_SHLIBDEPS OFF)
+set(CPACK_COMPONENT_PYTHON_DESCRIPTION "reports from audio programs, Python module
+Python programs describe with it what their audio is doing to the reporting
+daemon, without waiting for it. Without a daemon it does nothing, cheaply.")
+set(CPACK_DEBIAN_PYTHON_PACKAGE_DEPENDS "python3 (>= 3.9), python3-msgpack")
+set(CPACK_DEBIAN_PYTHON_PACKAGE_SUGGESTS "tonewerk-reporting-daemon")
+set(CPACK_DEBIAN_PYTHON_PACKAGE_CONTROL_EXTRA
+  ${CMAKE_CURRENT_LIST_DIR}/python/postinst ${CMAKE_CURRENT_LIST_DIR}/python/prerm)
 
 include(CPack)

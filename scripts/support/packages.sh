@@ -28,8 +28,8 @@ build_examples() {
   local sysroot=$1 directory=$2 file program command
   mkdir -p "$sysroot"
   for file in build/packages/libtwreporting*.deb; do dpkg-deb --extract "$file" "$sysroot"; done
-  for program in report.c report.cpp; do
-    command=$(sed -n 's|.*: \(c[c+]* report.*-pthread\).*|\1|p' examples/$program)
+  for program in report.c report.cpp player.c player.cpp; do
+    command=$(sed -n 's|.*: \(c[c+]* [a-z]*\.c.*-pthread\).*|\1|p' examples/$program)
     (
       cd examples
       export PKG_CONFIG_SYSROOT_DIR=$sysroot PKG_CONFIG_ALLOW_SYSTEM_CFLAGS=1 PKG_CONFIG_ALLOW_SYSTEM_LIBS=1

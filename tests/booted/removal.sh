@@ -4,7 +4,7 @@ export DEBIAN_FRONTEND=noninteractive
 # These files belong to the device's owner; no package removes them.
 rm -r /etc/systemd/system/$unit.d
 systemctl daemon-reload
-packages=$(dpkg-query --show --showformat '${Package} ' 'tonewerk-*' 'libtwreporting*')
+packages=$(dpkg-query --show --showformat '${Package} ' '*tonewerk-*' 'libtwreporting*')
 # complaint FILE: prints the lines of dpkg that are not about its normal work.
 complaint() { grep -vE '^(\(Reading database|Removing |Purging configuration|Processing triggers)' "$1"; }
 
@@ -33,7 +33,7 @@ check 'the system has nothing that failed' equal "$(systemctl --no-legend --plai
 check 'what the user has kept is the user'\''s' test -s /home/player/.local/state/tonewerk/reports.db
 
 # Installs the packages again, now with a running service manager.
-check 'the packages install on a running system' eval 'dpkg --install /tests/{lib,tonewerk}*.deb >/tmp/install 2>&1 || { cat /tmp/install; false; }'
+check 'the packages install on a running system' eval 'dpkg --install /tests/{lib,python3,tonewerk}*.deb >/tmp/install 2>&1 || { cat /tmp/install; false; }'
 check 'the installation complains of nothing' eval '! grep -vE "^(Selecting|Preparing|Unpacking|Setting up|Processing|Created symlink|\(Reading|Creating|/usr/lib/tmpfiles)" /tmp/install'
 check 'the first client is served at once' as player twctl --system list
 check 'whose directories are mounted' eval 'mountpoint -q /run/tonewerk/channels && mountpoint -q /run/tonewerk/notifications'
