@@ -4,6 +4,7 @@
 import datetime
 import os
 import re
+import signal
 import subprocess
 import sys
 import threading
@@ -286,16 +287,30 @@ class ClientTest(DaemonTestCase):
     def test_is_of_no_use_in_a_forked_child(self):
         client = self.client()
         session = self.player(client)
+        held, forked = threading.Event(), threading.Event()
+
+        def hold():  # as the client's thread may at the time of the fork
+            with client._changed:
+                held.set()
+                forked.wait(PATIENCE)
+
+        holder = threading.Thread(target=hold)
+        holder.start()
+        self.assertTrue(held.wait(PATIENCE))
         child = os.fork()
         if child == 0:
+            signal.alarm(PATIENCE)
             refused = 0
-            for call in (client.info, client.close, lambda: session.volume(1), lambda: client.send(4, 1, {})):
+            for call in (client.info, client.close, lambda: session.volume(1), lambda: client.send(4, 1, {}), session.stop):
                 try:
                     call()
                 except reporting.ForkedError:
                     refused += 1
+            session.close()  # does nothing
             os._exit(refused)
-        self.assertEqual(os.waitstatus_to_exitcode(os.waitpid(child, 0)[1]), 4)
+        forked.set()
+        holder.join()
+        self.assertEqual(os.waitstatus_to_exitcode(os.waitpid(child, 0)[1]), 5)
 
     def test_sends_what_is_queued_when_the_program_ends(self):
         self.start_daemon()

@@ -154,7 +154,7 @@ class Client:
 
         def close_at_exit() -> None:
             client = reference()
-            if client is not None and client._process == os.getpid():
+            if client is not None and not client.is_forked:
                 client.close(1.0)
 
         self._close_at_exit = close_at_exit
@@ -177,7 +177,7 @@ class Client:
             reporter_id = secrets.randbelow(2**62) | 2**62
         session = Session(self, check_integer(reporter_id, "reporter_id", -(2**63), 2**63 - 1))
         configuration = checked_map({} if application is None else {"HostApplicationDisplayID": application}, "configuration")
-        with self._changed:
+        with self._lock():
             self._begin()
             if reporter_id in self._sessions:
                 raise ValueError(f"reporter_id {reporter_id} is used by another session of this client")
@@ -189,7 +189,7 @@ class Client:
         return session
 
     def set_service(self, session: Session, service: int) -> None:
-        with self._changed:
+        with self._lock():
             self._begin()
             if session.wanted.is_started and session.wanted.service != service:
                 session.wanted.is_started = False
@@ -198,7 +198,7 @@ class Client:
             self._tell(session)
 
     def configure(self, session: Session, configuration: Dict[str, Any]) -> None:
-        with self._changed:
+        with self._lock():
             self._begin()
             merged = {**session.wanted.configuration, **configuration}
             frame("setConfiguration", [merged, session.id])  # raises when it is too large
@@ -206,7 +206,7 @@ class Client:
             self._tell(session)
 
     def start(self, session: Session) -> "Future[None]":
-        with self._changed:
+        with self._lock():
             self._begin()
             if session.run is None or session.run.done() or not session.wanted.is_started:
                 session.run = self._new_future()
@@ -217,14 +217,16 @@ class Client:
             return session.run
 
     def stop(self, session: Session) -> None:
-        with self._changed:
+        with self._lock():
             self._begin()
             session.wanted.is_started = False
             self._tell(session)
 
     def destroy(self, session: Session) -> None:
-        with self._changed:
-            if self._is_closing or self._process != os.getpid():
+        if self.is_forked:
+            return
+        with self._lock():
+            if self._is_closing:
                 return
             session.wanted.is_started = False
             session.wanted.exists = False
@@ -233,7 +235,7 @@ class Client:
     def send_to(self, session: Session, category: int, type: int, payload: Payload) -> bool:
         message = self._message(payload)
         parameters = [message, *self._kind(category, type), [session.id]]
-        with self._changed:
+        with self._lock():
             self._begin()
             if session.lost:
                 message["twreporting_dropped"] = session.lost
@@ -251,7 +253,7 @@ class Client:
         daemon's own session for single messages. Returns whether there was room."""
         identifiers = [check_integer(number, "reporter_id", -(2**63), 2**63 - 1) for number in reporter_ids]
         parameters = [self._message(payload), *self._kind(category, type), identifiers or None]
-        with self._changed:
+        with self._lock():
             self._begin()
             has_room = self._put_message(parameters)
             self._messages_dropped += 0 if has_room else 1
@@ -283,8 +285,7 @@ class Client:
     def flush(self, timeout: float) -> bool:
         """Waits until everything from before the call is sent. Returns whether it was within `timeout` seconds;
         False as soon as an attempt to connect fails."""
-        with self._changed:
-            self._check_process()
+        with self._lock():
             wanted = self._queued_commands
         return self._await(timeout, lambda: self._sent_commands >= wanted and not self._behind)
 
@@ -293,9 +294,9 @@ class Client:
 
         Without a daemon it does not wait. The daemon stops started sessions and reports them.
         """
-        self._check_process()
+        self.check_process()
         self._check_may_wait()
-        with self._changed:
+        with self._lock():
             if not self._is_closing:
                 self._is_closing = True
                 self._end_by = time.monotonic() + max(0.0, timeout)
@@ -311,8 +312,7 @@ class Client:
 
     def info(self) -> ClientInfo:
         """The state and the counters."""
-        with self._changed:
-            self._check_process()
+        with self._lock():
             return ClientInfo(
                 self._state,
                 self._last_error,
@@ -336,9 +336,20 @@ class Client:
 
     # ---- inside, on the caller's thread ----
 
-    def _check_process(self) -> None:
-        if self._process != os.getpid():
+    @property
+    def is_forked(self) -> bool:
+        """Whether this is a copy in a forked child, which is of no use."""
+        return self._process != os.getpid()
+
+    def check_process(self) -> None:
+        """Raises ForkedError in a forked child."""
+        if self.is_forked:
             raise ForkedError("the client belongs to the parent process")
+
+    def _lock(self) -> threading.Condition:
+        """The lock; not for a forked child, where another thread's copy may hold it for ever."""
+        self.check_process()
+        return self._changed
 
     def _check_may_wait(self) -> None:
         if threading.current_thread() is self._thread:
@@ -346,7 +357,6 @@ class Client:
 
     def _begin(self) -> None:
         """Prepares a request, with the lock held."""
-        self._check_process()
         if self._is_closing:
             raise ClosedError("the client is closed")
         if self._thread is None:
@@ -356,7 +366,7 @@ class Client:
 
     def _await(self, timeout: float, is_there: Callable[[], bool]) -> bool:
         self._check_may_wait()
-        with self._changed:
+        with self._lock():
             self._begin()
             failures = self._failures
             if self._state == State.WAITING:
@@ -370,7 +380,7 @@ class Client:
     def _ask(self, method: str, parameters: List[Any], may_be_held: bool = False) -> "Future[Any]":
         size = len(frame(method, parameters, 0)) + _COMMAND_BYTES
         future: "Future[Any]" = self._new_future()
-        with self._changed:
+        with self._lock():
             self._begin()
             if self._state == State.ENDED:
                 raise NotConnectedError("not connected to the daemon")

@@ -99,7 +99,7 @@ class Session:
 
     def close(self) -> None:
         """Stops the session and destroys it. May be called again."""
-        if self._is_closed:
+        if self._is_closed or self._client.is_forked:
             return
         self._end_activity()
         self._is_closed = True
@@ -180,12 +180,14 @@ class Session:
     # ---- inside ----
 
     def _open(self) -> "Session":
+        self._client.check_process()
         if self._is_closed:
             raise ClosedError("the session is closed")
         return self
 
     def begin_use(self, key: str, category: int) -> bool:
         """Begins to play or record. Returns whether the message had room."""
+        self._open()
         with self._activity:
             if not self.send(category, Type.STATE, {key: True}):
                 return False
@@ -196,6 +198,7 @@ class Session:
 
     def end_use(self, key: str, category: int) -> bool:
         """Ends it. Does nothing when it does not run. Returns whether the message had room."""
+        self._open()
         with self._activity:
             if key not in self._running:
                 return True
