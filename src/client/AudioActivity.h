@@ -9,8 +9,8 @@ namespace tonewerk {
 
 // Knows whether a session plays and records, and since when it has done the first of the two without a pause.
 //
-// Any thread may call it. It takes no lock, allocates nothing and makes no system call. A call repeats its few
-// instructions only when another thread has begun or ended something in between.
+// Any thread may call it. It takes no lock, allocates nothing and makes no system call. A call repeats its
+// few instructions only when another thread has begun or ended something in between.
 class AudioActivity {
  public:
   enum Kind : std::uint64_t { kPlaying = 1, kRecording = 2 };

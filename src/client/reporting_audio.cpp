@@ -1,6 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
-// Implements the functions that say what a session's audio does. Those of senders run on real-time threads: the
-// payloads are built on the stack.
+// Implements the functions that say what a session's audio does. Those of senders run on real-time threads:
+// the payloads are built on the stack.
 //
 // The daemon drops a message that repeats the newest one of its category and type. So each of the session's
 // properties has one category and type, and each message has the properties of this category and type only: a
