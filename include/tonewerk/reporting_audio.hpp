@@ -2,8 +2,8 @@
 #ifndef TONEWERK_REPORTING_AUDIO_HPP
 #define TONEWERK_REPORTING_AUDIO_HPP
 
-// Wraps tonewerk/reporting_audio.h for C++17 and later: says what a session's audio does, without keys. See there
-// for what is not described here.
+// Wraps tonewerk/reporting_audio.h for C++17 and later: says what a session's audio does, without keys. See
+// there for what is not described here.
 //
 //   namespace tr = tonewerk::reporting;
 //   tr::setApplication(session, "org.example.Player");
@@ -17,8 +17,8 @@
 //     ...
 //   }  // it has stopped
 //
-// `target` is a Session, on any thread, or a Sender, on its thread, which may be a real-time one: the functions
-// and objects here then take no lock, allocate nothing and make no system call. Nothing throws.
+// `target` is a Session, on any thread, or a Sender, on its thread, which may be a real-time one: the
+// functions and objects here then take no lock, allocate nothing and make no system call. Nothing throws.
 
 #include <cstdint>
 #include <memory>
@@ -97,8 +97,8 @@ inline Status reportOverload(Sender& target, const AudioOverload& known = {}) no
 
 // The common part of Playing and RecordingInput. It can be moved but not copied.
 //
-// Made with a Session, it keeps the session alive. Made with a Sender, it must be destroyed before the sender, on
-// the sender's thread.
+// Made with a Session, it keeps the session alive. Made with a Sender, it must be destroyed before the
+// sender, on the sender's thread.
 class AudioUse {
  public:
   AudioUse(const AudioUse&) = delete;
@@ -177,7 +177,8 @@ class Playing : public AudioUse {
     return call([&](twr_session* session) { return ::twr_session_volume(session, volume); },
                 [&](twr_sender* sender) { return ::twr_sender_volume(sender, volume); });
   }
-  // Ends it before the object does. Status::kInvalid when it does not play. After a failure it may be tried again.
+  // Ends it before the object does. Status::kInvalid when it does not play. After a failure it may be tried
+  // again.
   Status stop() noexcept { return end(&::twr_session_playing_stopped, &::twr_sender_playing_stopped); }
 };
 

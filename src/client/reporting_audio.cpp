@@ -33,9 +33,10 @@ class AudioPayload {
   twr_payload* get() { return &payload_; }
 
  private:
+  static constexpr std::size_t kTexts = 3;
   static constexpr std::size_t kRoomForKeys = 256;
 
-  unsigned char memory_[3 * TWR_MOST_AUDIO_TEXT_BYTES + kRoomForKeys];
+  unsigned char memory_[kTexts * TWR_MOST_AUDIO_TEXT_BYTES + kRoomForKeys];
   twr_payload payload_;
 };
 

@@ -46,6 +46,7 @@ class ReportingAudioTest : public ClientTest {
   }
   std::vector<std::string> next(int count) {
     std::vector<std::string> sayings;
+    sayings.reserve(static_cast<std::size_t>(count));
     for (int at = 0; at < count; ++at) sayings.push_back(sayingOf(connection->next()));
     return sayings;
   }
@@ -300,6 +301,7 @@ class ReportingAudioHppTest : public testing::Test {
   }
   std::vector<std::string> next(int count) {
     std::vector<std::string> sayings;
+    sayings.reserve(static_cast<std::size_t>(count));
     for (int at = 0; at < count; ++at) sayings.push_back(sayingOf(connection->next()));
     return sayings;
   }

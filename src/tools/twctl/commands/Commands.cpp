@@ -48,6 +48,7 @@ int runCommandLine(int argc, const char* const* argv, Tool& tool) {
   addChannelsCommand(app, tool);
   addPathsCommand(app, tool);
   addKillCommand(app, tool);
+  addSandboxCommand(app, tool);
   try {
     app.parse(argc, argv);
   } catch (const CLI::ParseError& error) {
