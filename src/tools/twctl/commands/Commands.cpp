@@ -39,6 +39,7 @@ int runCommandLine(int argc, const char* const* argv, Tool& tool) {
   addMetricsCommand(app, tool);
   addPowerCommand(app, tool);
   addRtcCommand(app, tool);
+  addSessionsCommand(app, tool);
   addReportCommand(app, tool);
   addSqlCommand(app, tool);
   addExportCommand(app, tool);

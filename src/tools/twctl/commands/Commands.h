@@ -25,6 +25,7 @@ void addEventsCommand(CLI::App& app, Tool& tool);
 void addMetricsCommand(CLI::App& app, Tool& tool);
 void addPowerCommand(CLI::App& app, Tool& tool);
 void addRtcCommand(CLI::App& app, Tool& tool);
+void addSessionsCommand(CLI::App& app, Tool& tool);
 void addReportCommand(CLI::App& app, Tool& tool);
 void addSqlCommand(CLI::App& app, Tool& tool);
 void addExportCommand(CLI::App& app, Tool& tool);

@@ -40,6 +40,14 @@ Table::Cell Table::Cell::time(double seconds) { return {textOf(Date{seconds}), j
 Table::Table(std::ostream& out, bool asJson, std::vector<std::string> columns)
     : out_(out), asJson_(asJson), columns_(std::move(columns)) {
   for (const std::string& column : columns_) widths_.push_back(utf8Characters(column));
+  isDropped_.resize(columns_.size());
+}
+
+void Table::dropWhenNarrow(const std::vector<std::string>& columns) {
+  for (const std::string& column : columns) {
+    const auto found = std::find(columns_.begin(), columns_.end(), column);
+    if (found != columns_.end()) toDrop_.push_back(static_cast<std::size_t>(found - columns_.begin()));
+  }
 }
 
 Table::~Table() { print(); }
@@ -63,6 +71,7 @@ void Table::add(std::vector<Cell> cells) {
 }
 
 void Table::print() {
+  if (!headPrinted_) dropColumns();
   std::optional<std::vector<std::size_t>> widths = inBlocks_ ? std::nullopt : fittingWidths();
   // What has begun as a table stays one.
   if (!widths && headPrinted_) widths = limited(kNarrowest);
@@ -80,17 +89,27 @@ void Table::print() {
   out_.flush();
 }
 
+void Table::dropColumns() {
+  for (const std::size_t column : toDrop_) {
+    if (!width_ || lengthOf(widths_) <= *width_) return;
+    isDropped_[column] = true;
+  }
+}
+
+std::size_t Table::lengthOf(const std::vector<std::size_t>& widths) const {
+  std::size_t length = 0;
+  for (std::size_t at = 0; at < widths.size(); ++at) {
+    if (!isDropped_[at]) length += (length == 0 ? 0 : kGap) + widths[at];
+  }
+  return length;
+}
+
 // All columns have one limit, the highest with which the line fits.
 std::optional<std::vector<std::size_t>> Table::fittingWidths() const {
   if (!width_) return widths_;
   std::size_t limit = std::min(*std::max_element(widths_.begin(), widths_.end()), *width_);
-  const auto total = [&] {
-    std::size_t sum = kGap * (widths_.size() - 1);
-    for (const std::size_t width : widths_) sum += std::min(width, limit);
-    return sum;
-  };
-  while (limit > kNarrowest && total() > *width_) --limit;
-  return total() > *width_ ? std::nullopt : std::optional(limited(limit));
+  while (limit > kNarrowest && lengthOf(limited(limit)) > *width_) --limit;
+  return lengthOf(limited(limit)) > *width_ ? std::nullopt : std::optional(limited(limit));
 }
 
 std::vector<std::size_t> Table::limited(std::size_t limit) const {
@@ -100,10 +119,13 @@ std::vector<std::size_t> Table::limited(std::size_t limit) const {
 }
 
 void Table::printRow(const std::vector<std::string>& texts, const std::vector<std::size_t>& widths) {
-  for (std::size_t at = 0; at < texts.size(); ++at) {
+  std::size_t last = texts.size() - 1;
+  while (last > 0 && isDropped_[last]) --last;
+  for (std::size_t at = 0; at <= last; ++at) {
+    if (isDropped_[at]) continue;
     const std::string text = cut(texts[at], widths[at]);
     out_ << text;
-    if (at + 1 < texts.size()) out_ << std::string(widths[at] - utf8Characters(text) + kGap, ' ');
+    if (at < last) out_ << std::string(widths[at] - utf8Characters(text) + kGap, ' ');
   }
   out_ << '\n';
 }

@@ -26,6 +26,9 @@ class Table {
   // are cut, which "…" shows. Where they would have too little left, each row is printed as a block of
   // "column  value" with whole values, and an empty line follows it.
   void fit(std::size_t width) { width_ = width; }
+  // Before lines are cut, leaves out columns until they fit: those of these names, from the first one on.
+  // Call it before the first row. Objects for programs keep all columns.
+  void dropWhenNarrow(const std::vector<std::string>& columns);
 
   struct Cell {
     std::string text;  // for people
@@ -42,11 +45,14 @@ class Table {
   void print();
 
  private:
+  void dropColumns();
   void printRow(const std::vector<std::string>& texts, const std::vector<std::size_t>& widths);
   void printBlock(const std::vector<std::string>& texts);
   // The widths that fit; none when the columns would have too little left.
   std::optional<std::vector<std::size_t>> fittingWidths() const;
   std::vector<std::size_t> limited(std::size_t limit) const;
+  // The length of a line with these widths, without the columns that are left out.
+  std::size_t lengthOf(const std::vector<std::size_t>& widths) const;
 
   // Rows are printed in portions of this size, so that a long table needs little memory.
   static constexpr std::size_t kPortion = 500;
@@ -61,6 +67,8 @@ class Table {
   std::vector<std::vector<std::string>> rows_;
   std::size_t rowBytes_ = 0;
   std::optional<std::size_t> width_;
+  std::vector<std::size_t> toDrop_;  // places of columns, the first one to drop first
+  std::vector<bool> isDropped_;      // by column
   bool headPrinted_ = false;
   bool inBlocks_ = false;
 };

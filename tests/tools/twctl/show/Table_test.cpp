@@ -56,6 +56,30 @@ TEST(TableTest, CutsTheWidestColumnsToTheWidth) {
             "6   short         \n");
 }
 
+TEST(TableTest, LeavesOutColumnsBeforeItCuts) {
+  const auto tableOf = [](std::size_t width) {
+    std::ostringstream out;
+    Table table(out, false, {"id", "process", "application", "user"});
+    table.fit(width);
+    table.dropWhenNarrow({"user", "process"});
+    table.add({Value(5), Value("player"), Value("com.example.player"), Value(1000)});
+    table.print();
+    return out.str();
+  };
+  EXPECT_EQ(tableOf(37),
+            "id  process  application         user\n"
+            "5   player   com.example.player  1000\n");
+  EXPECT_EQ(tableOf(36),
+            "id  process  application\n"
+            "5   player   com.example.player\n");
+  EXPECT_EQ(tableOf(30),
+            "id  application\n"
+            "5   com.example.player\n");
+  EXPECT_EQ(tableOf(20),
+            "id  application\n"
+            "5   com.example.pla\u2026\n");
+}
+
 TEST(TableTest, DoesNotCutWhatFits) {
   std::ostringstream out;
   {
