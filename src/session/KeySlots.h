@@ -32,6 +32,14 @@ class KeySlots {
   // not packed or whose shape is not of the same client as the first one.
   bool mayHaveAny(const ValueMap& message) { return rowOf(message.shape()) != kNoKeys; }
 
+  // Returns whether the message has one of the keys. Takes a comparison of keys for each.
+  bool hasAny(const ValueMap& message) const {
+    for (const std::string_view key : keys_) {
+      if (message.contains(key)) return true;
+    }
+    return false;
+  }
+
   // Returns the value of the key with this index, or none.
   ValueView view(const ValueMap& message, std::size_t key) {
     const std::uint32_t row = rowOf(message.shape());

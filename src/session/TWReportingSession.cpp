@@ -10,6 +10,7 @@
 #include "platform/JournalPosition.h"
 #include "platform/Log.h"
 #include "session/MessageShapes.h"
+#include "session/ReasonTrace.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingKeys.h"
 #include "session/TWReportingTracePoint.h"
@@ -168,6 +169,7 @@ void TWReportingSession::beginLife() {
                                                          .request = JournalPosition::current().sequence(),
                                                          .service = SharedString(serviceName_)});
   enterLife();
+  if (auto* reasons = ReasonTrace::current()) reasons->lifeBegan(*this, life_->beginning);
 }
 
 void TWReportingSession::enterLife(const std::optional<SessionEnd>& end) {
@@ -194,6 +196,7 @@ void TWReportingSession::endLife(SessionEnd end) {
   end.activeSeconds = activeSeconds_;
   end.overloads = overloads_;
   enterLife(end);
+  if (auto* reasons = ReasonTrace::current()) reasons->lifeEnded(*this, end);
   life_.reset();
 }
 
@@ -331,6 +334,11 @@ void TWReportingSession::sendMessage(TWReportingSessionMessage& message, const M
   const TWReportingSessionMessage* stored =
       message.isRedundant ? nullptr : store(message, isForeign ? sender : nullptr);
   if (!message.isRedundant && stored == nullptr) ++unkeptMessageCount_;
+  if (auto* reasons = ReasonTrace::current()) {
+    const TWReportingSessionMessage* repeated =
+        message.isRedundant ? newest_.find({message.category, message.type}) : nullptr;
+    reasons->messageArrived(*this, {message, stored, repeated});
+  }
   // A worker that keeps the payload shares that of the stored message, which takes memory anyway. A copy,
   // because a worker may stop the session.
   if (stored == nullptr) {
@@ -371,6 +379,7 @@ void TWReportingSession::stop(SessionEnding ending) {
     for (const auto* message : messages_) newest_.set({message->category, message->type}, message);
   }
 
+  if (auto* reasons = ReasonTrace::current()) reasons->stopping(*this);
   const LogCategory* debug = debugCategory();
   forEachWorker(Order::kProducersFirst, [&](TWReportingSessionWorkerProtocol& worker) {
     if (!worker.started) return;

@@ -5,6 +5,7 @@
 
 #include "session/ForEachMessage.h"
 #include "session/KeySlots.h"
+#include "session/ReasonTrace.h"
 #include "values/ValueView.h"
 
 namespace tonewerk {
@@ -31,7 +32,11 @@ std::vector<std::size_t> TWReportingSessionWorkerUtility::mergeRapidMessages(
       return;
     }
     // Each merge updates the anchor's time. A pause that is not a number does not count as short.
-    if (message.epochTime() - anchor->epochTime() < maximumPausetime) {
+    const double pause = message.epochTime() - anchor->epochTime();
+    const bool isRapid = pause < maximumPausetime;
+    if (auto* reasons = ReasonTrace::current())
+      reasons->rapidMessage({anchor->message, message.message, pause, maximumPausetime, isRapid});
+    if (isRapid) {
       anchor->message.merge(message.message);
       merged.push_back(place);
     }

@@ -16,6 +16,7 @@
 #include "platform/linux/json/NlohmannJsonService.h"
 #include "protocol/Requests.h"
 #include "tools/offline/OfflineReplay.h"
+#include "tools/offline/ReasonRecorder.h"
 #include "tools/recording/RecordingFile.h"
 #include "tools/twctl/DaemonCalls.h"
 #include "tools/twctl/Tool.h"
@@ -30,7 +31,8 @@ static_assert(std::atomic<bool>::is_always_lock_free, "the handler of signals wr
 
 void interrupt(int /*signal*/) { isInterrupted = true; }
 
-int replay(Tool& tool, JsonService& json, const std::string& file, const std::string& store) {
+int replay(Tool& tool, JsonService& json, bool tellsReasons, const std::string& file,
+           const std::string& store) {
   std::string problem;
   const std::optional<Recording> recording = readRecordingFile(file, requests::all(), tool.json, problem);
   if (recording) problem = OfflineReplay::problemWith(*recording, tool.json);
@@ -44,8 +46,13 @@ int replay(Tool& tool, JsonService& json, const std::string& file, const std::st
     tool.status = tool.fail(kRefused, file + ": line " + std::to_string(call.line) + ": " +
                                           DaemonCalls::describe(call.method, error));
   });
+  ReasonRecorder recorder(tool.out);
+  std::optional<ReasonTrace::Scope> scope;
+  if (tellsReasons) scope.emplace(recorder);
   problem = offline.play(*recording, store, isInterrupted);
-  if (!problem.empty()) return tool.fail(kRefused, problem);
+  // Another status than that of a refused request: the reasons are not whole.
+  if (!problem.empty()) return tool.fail(tellsReasons ? kWrongUsage : kRefused, problem);
+  if (tellsReasons) return tool.out.flush() ? tool.status : tool.fail(kWrongUsage, "cannot write the output");
   Table(tool.out, tool.asJson, {"requests", "refused"}).add({Value(recording->requests()), Value(refused)});
   if (!tool.out.flush()) return tool.fail(kRefused, "cannot write the output");
   return tool.status;
@@ -55,15 +62,16 @@ int run(int argc, char** argv) {
   NlohmannJsonService json;
   Tool tool{std::cout, std::cerr, json};
   tool.asJson = argc == 4 && std::string_view(argv[1]) == "--json";
-  if (argc != 3 && !tool.asJson) {
-    std::cerr << "usage: tw-replay [--json] FILE STORE\n";
+  const bool tellsReasons = argc == 4 && std::string_view(argv[1]) == "--reasons";
+  if (argc != 3 && !tool.asJson && !tellsReasons) {
+    std::cerr << "usage: tw-replay [--json | --reasons] FILE STORE\n";
     return kWrongUsage;
   }
   std::signal(SIGINT, interrupt);
   std::signal(SIGTERM, interrupt);
   std::signal(SIGHUP, interrupt);
   std::signal(SIGXFSZ, SIG_IGN);  // writing past the file size limit then fails instead of ending the process
-  return replay(tool, json, argv[argc - 2], argv[argc - 1]);
+  return replay(tool, json, tellsReasons, argv[argc - 2], argv[argc - 1]);
 }
 
 }  // namespace

@@ -13,6 +13,10 @@ namespace {
 
 double numberOrZero(const std::optional<Value>& value) { return value ? value->number() : 0.0; }
 
+std::optional<double> secondsOf(const std::optional<Value>& time) {
+  return time ? std::optional(time->number()) : std::nullopt;
+}
+
 // When the message was sent; none when it does not say so.
 std::optional<Value> timestampOf(const ValueMap& message) {
   const ValueView timestamp = message.view(TWReportingMessageKeyTWTimestamp);
@@ -68,20 +72,20 @@ bool IntervalWalk::Latest::changesText() {
   if (!before || !after) return false;
   const auto textBefore = before.asText();
   const auto textAfter = after.asText();
-  if (textBefore && textAfter) return *textBefore != *textAfter;
-  return before.text() != after.text();
+  if (textBefore && textAfter) return noted(*textBefore != *textAfter);
+  return noted(before.text() != after.text());
 }
 
 bool IntervalWalk::Latest::changesNumber() {
   const ValueView before = find();
   const ValueView after = now();
-  return before && after && before.number() != after.number();
+  return noted(before && after && before.number() != after.number());
 }
 
 bool IntervalWalk::Latest::changes() {
   const ValueView before = find();
   const ValueView after = now();
-  return before && after && !(before == after);
+  return noted(before && after && !(before == after));
 }
 
 IntervalWalk::IntervalWalk(const Kind& kind, const LogSite& site, double minimumSeconds,
@@ -93,7 +97,13 @@ IntervalWalk::IntervalWalk(const Kind& kind, const LogSite& site, double minimum
       runningKey_(keys_.add(kind.runningKey)),
       durationKey_(keys_.add(TWReportingMessageKeySessionDuration)),
       wasRunning_(previousValues_.boolean(kind.runningKey)) {
-  if (!wasRunning_) return;
+  const bool runsBefore = wasRunning_;
+  if (wasRunning_) beginRunning();
+  if (auto* reasons = ReasonTrace::current())
+    reasons->walkBegan({kind.category, kind.runningKey, minimumSeconds, runsBefore, secondsOf(begin_)});
+}
+
+void IntervalWalk::beginRunning() {
   switch (kind_.openInterval) {
     case OpenInterval::kContinues:
       isRunning_ = true;
@@ -123,6 +133,7 @@ TWReportingSessionMessages IntervalWalk::summariesOf(MessageRange messages,
   for (const auto& summary : summaries_) {
     summary->message.set(TWReportingMessageKeyMessageCount, summaries_.size());
   }
+  if (auto* reasons = ReasonTrace::current()) reasons->walkEnded(summaries_.size(), secondsOf(begin_));
   return std::move(summaries_);
 }
 
@@ -134,26 +145,45 @@ void IntervalWalk::step() {
   bool ends = isLast;
   if (running_) {
     isRunning_ = saysOn;
-    if (!wasRunning_ && isRunning_ && begins()) begin_ = timestampOf(message());
+    if (!wasRunning_ && isRunning_) beginInterval();
     if (!isRunning_) ends = true;
   } else if (isLast) {
     isRunning_ = false;
   }
+  cause_ = running_ && !isRunning_ ? ReasonTrace::Cause::kStopped : ReasonTrace::Cause::kLast;
   if (isRunning_) {
-    if (endsInterval()) ends = true;
+    if (endsInterval()) {
+      if (!isLast) cause_ = ReasonTrace::Cause::kChanged;
+      ends = true;
+    }
     collect();
   }
   if (wasRunning_ && ends) {
     const std::optional<Value> timestamp = timestampOf(message());
     endInterval(timestamp);
     begin_ = timestamp;  // of the next interval, when output or input keeps running
+    beginPlace_ = walked_.size() - 1;
   }
   if (!isRunning_) begin_.reset();
   if (running_) wasRunning_ = saysOn;
 }
 
+void IntervalWalk::beginInterval() {
+  const bool isBegin = begins();
+  if (isBegin) {
+    begin_ = timestampOf(message());
+    beginPlace_ = walked_.size() - 1;
+  }
+  if (auto* reasons = ReasonTrace::current()) {
+    reasons->stretchBegan(
+        {message(), secondsOf(timestampOf(message())), isBegin ? std::string_view() : beginKey()});
+  }
+}
+
 void IntervalWalk::endInterval(const std::optional<Value>& end) {
+  outcome_ = ReasonTrace::Outcome::kSummary;
   std::optional<ValueMap> summary = summaryUntil(end);
+  if (auto* reasons = ReasonTrace::current()) tellEnd(*reasons, end);
   if (!summary) {
     debugLog(site_, "skipped %@ message, too short { func=%s, action=skip, count=%lu }", kind_.subject,
              kind_.function, summaries_.size());
@@ -174,7 +204,7 @@ std::optional<ValueMap> IntervalWalk::summaryUntil(const std::optional<Value>& e
 
 // The length of the current interval in seconds. None when it is too short, when one of its times is missing,
 // or when the length is not a number.
-std::optional<double> IntervalWalk::measure(const std::optional<Value>& end) const {
+std::optional<double> IntervalWalk::measure(const std::optional<Value>& end) {
   const double length = numberOrZero(end) - numberOrZero(begin_);
   debugLog(site_,
            "%@ { func=%s, %@=%f, twTimestamp=%@, twTimestamp_double=%f, startTwTimestamp=%@, "
@@ -183,7 +213,31 @@ std::optional<double> IntervalWalk::measure(const std::optional<Value>& end) con
            numberOrZero(begin_));
   const bool isLongEnough =
       begin_ && end && length > minimumSeconds_;  // false when the length is not a number
-  return isLongEnough ? std::optional<double>(length) : std::nullopt;
+  if (isLongEnough) return length;
+  outcome_ = !begin_ ? ReasonTrace::Outcome::kNoBegin
+             : !end  ? ReasonTrace::Outcome::kNoEnd
+                     : ReasonTrace::Outcome::kTooShort;
+  return std::nullopt;
+}
+
+void IntervalWalk::tellEnd(ReasonTrace& reasons, const std::optional<Value>& end) {
+  std::vector<const ValueMap*> messages;
+  for (std::size_t place = beginPlace_; place < walked_.size(); ++place) {
+    if (keys_.hasAny(*walked_[place])) messages.push_back(walked_[place]);
+  }
+  ReasonTrace::End told{.message = message(),
+                        .cause = cause_,
+                        .from = secondsOf(begin_),
+                        .until = secondsOf(end),
+                        .outcome = outcome_,
+                        .index = static_cast<std::int32_t>(summaries_.size()) + 1,
+                        .messages = messages};
+  if (cause_ == ReasonTrace::Cause::kChanged && change_ != nullptr) {
+    told.key = change_->name();
+    told.before = change_->find();
+    told.after = change_->now();
+  }
+  reasons.stretchEnded(told);
 }
 
 }  // namespace tonewerk

@@ -11,6 +11,7 @@
 #include "platform/Log.h"
 #include "session/KeySlots.h"
 #include "session/MessageRange.h"
+#include "session/ReasonTrace.h"
 #include "session/TWReportingSessionMessage.h"
 #include "values/Value.h"
 #include "values/ValueView.h"
@@ -102,7 +103,14 @@ class IntervalWalk {
     bool changesNumber();
     bool changes();
 
+    std::string_view name() const { return name_; }
+
    private:
+    // Remembers a change for the trace of reasons.
+    bool noted(bool isChange) {
+      if (isChange) walk_.change_ = this;
+      return isChange;
+    }
     ValueView in(std::size_t place);
 
     IntervalWalk& walk_;
@@ -121,9 +129,22 @@ class IntervalWalk {
   // Whether it says that output or input runs, or that it does not.
   bool saysRunning() const { return static_cast<bool>(running_); }
 
+  // For the trace of reasons: returns true, since a change of this value ends the interval; returns no
+  // summary, for this reason.
+  bool endsBy(Latest& value) {
+    change_ = &value;
+    return true;
+  }
+  std::optional<ValueMap> withhold(ReasonTrace::Outcome why) {
+    outcome_ = why;
+    return std::nullopt;
+  }
+
  private:
   // Whether a message that starts output or input begins an interval.
   virtual bool begins() { return true; }
+  // The key that decides that, for the trace of reasons.
+  virtual std::string_view beginKey() const { return {}; }
   // Whether a message ends the interval although output or input still runs.
   virtual bool endsInterval() = 0;
   // Called for each message while output or input runs, before the message ends an interval.
@@ -133,9 +154,13 @@ class IntervalWalk {
   virtual std::optional<ValueMap> summaryOf(const Interval& interval) = 0;
 
   void step();
+  // The previous values show output or input running.
+  void beginRunning();
+  void beginInterval();
   void endInterval(const std::optional<Value>& end);
-  std::optional<double> measure(const std::optional<Value>& end) const;
+  std::optional<double> measure(const std::optional<Value>& end);
   std::optional<ValueMap> summaryUntil(const std::optional<Value>& end);
+  void tellEnd(ReasonTrace& reasons, const std::optional<Value>& end);
 
   const Kind kind_;
   const LogSite site_;
@@ -151,6 +176,12 @@ class IntervalWalk {
   bool isRunning_ = false;
   std::optional<Value> begin_;  // the time at which the current interval began
   TWReportingSessionMessages summaries_;
+
+  // What the trace of reasons is told, if there is one.
+  Latest* change_ = nullptr;    // the value that changed last
+  std::size_t beginPlace_ = 0;  // in walked_, of the message that began the interval
+  ReasonTrace::Cause cause_ = ReasonTrace::Cause::kStopped;
+  ReasonTrace::Outcome outcome_ = ReasonTrace::Outcome::kSummary;
 };
 
 }  // namespace tonewerk

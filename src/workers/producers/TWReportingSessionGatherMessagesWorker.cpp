@@ -32,18 +32,19 @@ class GatherWalk final : public IntervalWalk {
   static bool isInGather(ValueView gather) { return gather.integer() == 1; }
 
   bool begins() override { return isInGather(gather_.now()); }
+  std::string_view beginKey() const override { return gather_.name(); }
 
   bool endsInterval() override {
     // A further start of output that is not in a Gather session ends an interval that is in one.
-    if (saysRunning() && isInGather(gather_.find()) && !isInGather(gather_.now())) return true;
+    if (saysRunning() && isInGather(gather_.find()) && !isInGather(gather_.now())) return endsBy(gather_);
     if (selectedFormat_.changesText() || activeDevices_.changesText()) return true;
     // A 0 without a start of output ends no interval in a Gather session. It ends one that is in none.
     const ValueView gather = gather_.now();
-    return gather && gather.integer() == 0 && !isInGather(gather_.find());
+    return gather && gather.integer() == 0 && !isInGather(gather_.find()) && endsBy(gather_);
   }
 
   std::optional<ValueMap> summaryOf(const Interval& interval) override {
-    if (!gather_.find()) return std::nullopt;
+    if (!gather_.find()) return withhold(ReasonTrace::Outcome::kNotInGather);
     return ValueMap{{TWReportingMessageKeySelectedFormat, selectedFormat_.value()},
                     {TWReportingMessageKeyFormatID, formatID_.value()},
                     {TWReportingMessageKeyActiveDevices, activeDevices_.value()},

@@ -64,7 +64,7 @@ class InputWalk final : public IntervalWalk {
   }
 
   std::optional<ValueMap> summaryOf(const Interval& interval) override {
-    if (process_ == nullptr) return std::nullopt;
+    if (process_ == nullptr) return withhold(ReasonTrace::Outcome::kNoApplication);
     ValueMap summary{{TWReportingApplicationName, *process_},
                      {TWReportingMessageKeyInputrunningSeconds, interval.length()},
                      {TWReportingMessageKeyInputrunningSecondsBucketed, interval.bucketedLength()},

@@ -43,7 +43,8 @@ class VolumeWalk final : public IntervalWalk {
 
   std::optional<ValueMap> summaryOf(const Interval& interval) override {
     const ValueView volume = volume_.find();
-    if (process_ == nullptr || !volume) return std::nullopt;
+    if (process_ == nullptr) return withhold(ReasonTrace::Outcome::kNoApplication);
+    if (!volume) return withhold(ReasonTrace::Outcome::kNoVolume);
     return ValueMap{{TWReportingMessageKeySelectedFormat, selectedFormat_.value()},
                     {TWReportingMessageKeyFormatID, formatID_.value()},
                     {TWReportingMessageKeyActiveDevices, activeDevices_.value()},
