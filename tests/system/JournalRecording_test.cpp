@@ -224,6 +224,30 @@ TEST_F(JournalRecordingTest, TheReplayGivesTheReportsOfADaemonThatWasKilledAndOf
   expectSameReports({"events"});
 }
 
+TEST_F(JournalRecordingTest, OneSessionTellsItsReasons) {
+  {
+    DaemonClient player = connect();
+    play(player, kSession, kLongFormAudio);
+    player.stop(kSession);
+    // Another life of the same session, which is not asked for.
+    player.start(kSession);
+    player.send({{"number", 1}}, kPlayback, kTypeStart, {kSession});
+    player.stop(kSession);
+  }
+  ASSERT_EQ(daemon.stop(), 0);
+  const std::string story = twctl({"session", "1"}, ownState());
+  EXPECT_THAT(story,
+              HasSubstr("Playback Generic: redundant, it repeats message 2 in everything but its times\n"));
+  EXPECT_THAT(story,
+              HasSubstr("10 s  QMSessionVolume changed from 0.25 to 0.75 (message 2) -> Volume Summary 1 "
+                        "of 2, event "));
+  EXPECT_THAT(story, HasSubstr("50 s  output stopped (message 4) -> Volume Summary 2 of 2, event "));
+  EXPECT_THAT(story, Not(HasSubstr("number=1")));
+  EXPECT_THAT(twctl({"explain", "--session", "1", "--missing", "input"}, ownState()),
+              HasSubstr("none: no message said that input began or ended (session_input_running)\n"));
+  EXPECT_THAT(twctl({"session", "2"}, ownState()), HasSubstr("Playback Start: number=1\n"));
+}
+
 TEST_F(JournalRecordingTest, OneSessionGivesItsReports) {
   constexpr const char* kSummaries = "com.orvane.longformaudio.Volume.Summary";
   {

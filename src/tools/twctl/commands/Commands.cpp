@@ -40,6 +40,7 @@ int runCommandLine(int argc, const char* const* argv, Tool& tool) {
   addPowerCommand(app, tool);
   addRtcCommand(app, tool);
   addSessionsCommand(app, tool);
+  addSessionCommands(app, tool);
   addReportCommand(app, tool);
   addSqlCommand(app, tool);
   addExportCommand(app, tool);

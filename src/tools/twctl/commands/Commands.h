@@ -26,6 +26,8 @@ void addMetricsCommand(CLI::App& app, Tool& tool);
 void addPowerCommand(CLI::App& app, Tool& tool);
 void addRtcCommand(CLI::App& app, Tool& tool);
 void addSessionsCommand(CLI::App& app, Tool& tool);
+// Adds session and explain.
+void addSessionCommands(CLI::App& app, Tool& tool);
 void addReportCommand(CLI::App& app, Tool& tool);
 void addSqlCommand(CLI::App& app, Tool& tool);
 void addExportCommand(CLI::App& app, Tool& tool);

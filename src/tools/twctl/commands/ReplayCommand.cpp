@@ -1,16 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <CLI/CLI.hpp>
-#include <cerrno>
 #include <cmath>
-#include <filesystem>
 #include <limits>
 #include <memory>
 #include <optional>
-#include <spawn.h>
 #include <string>
 #include <sys/wait.h>
 #include <system_error>
-#include <unistd.h>
 #include <utility>
 #include <vector>
 
@@ -18,6 +14,7 @@
 #include "tools/recording/RecordingFile.h"
 #include "tools/twctl/DaemonCalls.h"
 #include "tools/twctl/commands/Commands.h"
+#include "tools/twctl/commands/OfflineProgram.h"
 #include "tools/twctl/commands/RecordingPlayer.h"
 #include "tools/twctl/input/ValueArguments.h"
 #include "tools/twctl/show/Table.h"
@@ -41,31 +38,15 @@ std::optional<double> speedOf(const std::string& text) {
   return value.number();
 }
 
-// The program that plays recordings to the core: it is in the directory of this one.
-std::string offlineProgram() {
-  std::error_code error;
-  const std::filesystem::path executable = std::filesystem::read_symlink("/proc/self/exe", error);
-  return executable.parent_path() / "tw-replay";
-}
-
-// Runs the program with this one's streams, and returns its exit status. A signal to the terminal's programs
-// reaches it, too.
+// Runs the program with this one's streams, and returns its exit status.
 int replayOffline(Tool& tool, const ReplayOptions& options) {
   std::vector<std::string> words{offlineProgram()};
   if (tool.asJson) words.emplace_back("--json");
   words.insert(words.end(), {options.file, options.store});
-  std::vector<char*> arguments;
-  arguments.reserve(words.size() + 1);
-  for (std::string& word : words) arguments.push_back(word.data());
-  arguments.push_back(nullptr);
   tool.out.flush();
-  pid_t process = 0;
-  if (const int error = posix_spawn(&process, arguments[0], nullptr, nullptr, arguments.data(), environ)) {
-    return tool.fail(kRefused, words[0] + ": " + std::generic_category().message(error));
-  }
   int status = 0;
-  while (waitpid(process, &status, 0) < 0 && errno == EINTR) {
-  }
+  if (const std::error_code error = runProgram(words, {}, status))
+    return tool.fail(kRefused, words[0] + ": " + error.message());
   if (WIFEXITED(status)) return WEXITSTATUS(status);
   return tool.fail(kRefused, words[0] + " has ended unexpectedly");
 }

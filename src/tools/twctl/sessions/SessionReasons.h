@@ -1,0 +1,51 @@
+// SPDX-License-Identifier: Apache-2.0
+#pragma once
+
+#include <cstdint>
+#include <iosfwd>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "tools/twctl/sessions/StoredSessions.h"
+#include "values/Value.h"
+
+namespace tonewerk {
+
+class JsonService;
+
+// Why the core did what it did in one life of a session, as it told when the session was played again. The
+// maps have the keys of tools/recording/ReasonKeys.h.
+struct ReasonedLife {
+  // What a producer looked for, and found.
+  struct Walk {
+    ValueMap about;               // "walk"
+    std::vector<ValueMap> steps;  // "rapid", "stretch" and "stretchEnd", in order
+    ValueMap end;                 // "walkEnd"
+  };
+
+  std::int64_t reporterID = 0;
+  std::int64_t user = 0;
+  std::optional<std::string> process;
+  std::optional<double> startedAt;  // in seconds since 1970
+  std::vector<ValueMap> messages;   // "message", in the order of their arrival
+  std::vector<Walk> walks;
+  std::optional<ValueMap> end;  // "end"
+
+  // Null when there is no such message.
+  const ValueMap* message(std::int64_t number) const;
+  // The walk for the summaries of this category; null when there was none.
+  const Walk* walk(const std::string& category) const;
+};
+
+// Reads what `tw-replay --reasons` has printed. None when a line is something else; `problem` says which one.
+[[nodiscard]] std::optional<std::vector<ReasonedLife>> readReasons(std::istream& text,
+                                                                   const JsonService& json,
+                                                                   std::string& problem);
+
+// The life of a session in the store; null when there is none. Clients may use the same identifier at the
+// same time, so users and processes are compared, too.
+[[nodiscard]] const ReasonedLife* lifeOf(const std::vector<ReasonedLife>& lives,
+                                         const StoredSession& session);
+
+}  // namespace tonewerk

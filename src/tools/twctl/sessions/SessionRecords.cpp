@@ -1,0 +1,86 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "tools/twctl/sessions/SessionRecords.h"
+
+#include "tools/twctl/sessions/ViewRows.h"
+
+namespace tonewerk {
+namespace {
+
+std::string stretchesOf(const std::string& session) {
+  return "SELECT id, 'Volume', started_at, ended_at, seconds, device, volume FROM volume_stretch WHERE "
+         "session = " +
+         session +
+         " UNION ALL SELECT id, 'Input', started_at, ended_at, seconds, device, NULL FROM input_stretch "
+         "WHERE "
+         "session = " +
+         session +
+         " UNION ALL SELECT id, 'Gather', started_at, ended_at, seconds, device, NULL FROM gather_stretch "
+         "WHERE session = " +
+         session + " ORDER BY 3, 1";
+}
+
+}  // namespace
+
+std::optional<SessionRecords> readRecords(SqlReader& reader, std::int64_t session, std::string& problem) {
+  SessionRecords records;
+  const std::string id = std::to_string(session);
+  const bool isRead =
+      eachRow(reader,
+              "SELECT category, type, coalesce(source, ''), count(*) FROM event WHERE session = " + id +
+                  " GROUP BY 1, 2, 3 ORDER BY 4 DESC, 1, 2, 3",
+              {}, problem,
+              [&](const ViewRow& row) {
+                records.kinds.push_back({row.text(0).value_or(""), row.text(1).value_or(""),
+                                         row.text(2).value_or(""), row.integer(3).value_or(0)});
+              }) &&
+      eachRow(reader, stretchesOf(id), {}, problem,
+              [&](const ViewRow& row) {
+                records.stretches.push_back({row.integer(0).value_or(0), row.text(1).value_or(""),
+                                             row.number(2), row.number(3), row.number(4).value_or(0.0),
+                                             row.text(5), row.number(6)});
+              }) &&
+      eachRow(reader,
+              "SELECT id, at, kind, node, duration_seconds, buffer_frames FROM issue WHERE session = " + id +
+                  " ORDER BY at, id",
+              {}, problem,
+              [&](const ViewRow& row) {
+                records.issues.push_back({row.integer(0).value_or(0), row.number(1).value_or(0.0),
+                                          row.text(2).value_or("issue"), row.text(3), row.number(4),
+                                          row.integer(5)});
+              }) &&
+      eachRow(reader,
+              "SELECT id, category, payload ->> 'msgidx' FROM event WHERE session = " + id +
+                  " AND type = 'Summary' AND category IN ('Volume', 'Input', 'Gather') AND source IS NOT "
+                  "'client'",
+              {}, problem, [&](const ViewRow& row) {
+                const std::pair name(row.text(1).value_or(""), row.integer(2).value_or(0));
+                records.summaries.emplace(name, row.integer(0).value_or(0));
+              });
+  return isRead ? std::optional(std::move(records)) : std::nullopt;
+}
+
+std::optional<StoredEventRow> readEvent(SqlReader& reader, std::int64_t id, std::string& problem) {
+  std::optional<StoredEventRow> event;
+  const bool isRead = eachRow(
+      reader,
+      "SELECT id, at, session, category, type, coalesce(source, ''), payload ->> "
+      "'twreporting_timestamp', payload ->> 'msgidx' FROM event WHERE id = " +
+          std::to_string(id),
+      {}, problem, [&](const ViewRow& row) {
+        event = {
+            row.integer(0).value_or(0), row.number(1).value_or(0.0), row.integer(2), row.text(3).value_or(""),
+            row.text(4).value_or(""),   row.text(5).value_or(""),    row.number(6),  row.integer(7)};
+      });
+  if (!isRead || event) return event;
+  problem = "the store has no event " + std::to_string(id);
+  std::string ignored;
+  (void)eachRow(reader, "SELECT min(id), max(id) FROM event", {}, ignored, [&](const ViewRow& row) {
+    if (row.integer(0))
+      problem += "; it has events from " + std::to_string(*row.integer(0)) + " to " +
+                 std::to_string(row.integer(1).value_or(0));
+  });
+  problem += "; `twctl sql \"SELECT id, at, session, category, type FROM event\"` lists them";
+  return std::nullopt;
+}
+
+}  // namespace tonewerk

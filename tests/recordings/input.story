@@ -1,0 +1,41 @@
+Session 1: org.example.Phone (process unknown, user 1000) for telephony, reporter 7.
+It began at 2026-01-01T00:00:00Z and ended at 2026-01-01T00:00:21Z, after 21 s: it was stopped.
+10 messages, 0 of them redundant; 0 overloads; 19.5 s active.
+
+Messages, by the seconds since it began
+  1  +1 s  Input Start: session_input_running=1 active_devices=Mic vp_config_operation_mode=vc
+    vp_config_input_port=Mic
+  2  +2 s  Input Generic: vp_config_primary_vocoder=B vp_config_primary_vocoderFs=8000.000000
+  3  +3 s  Input Generic: vp_config_primary_vocoder=Opus vp_config_primary_vocoderFs=0.000000
+  4  +4 s  Input Generic: vp_config_primary_vocoder=A vp_config_primary_vocoderFs=16000.000000
+  5  +5 s  Input Generic: vp_config_primary_vocoder=C
+  6  +11 s  RouteChange Generic: active_devices=Headset
+  7  +11.5 s  RouteChange Generic: active_devices=Mic
+  8  +12.5 s  Input Stop: session_input_running=0
+  9  +20 s  Input Start: session_input_running=1
+  10  +20.5 s  Setup Stop: session_duration=19.5 session_input_running=0
+
+Made by the daemon
+  11  +21 s  Session_Generic Summary: total_active_time=19.5 active_count=1 overload_count=0
+    average_active_time=19.5 num_messages=10 num_unique_messages=12
+    num_redundant_messages=18446744073709551614 singleMessageSession=0 summaryServiceName=telephony
+    thermal_state=Nominal low_power_enabled=0 vmInfo_phys_footprint_MiB=8 load_avg_1_min=0
+    load_avg_5_min=0 load_avg_15_min=0
+
+Volume summaries: 0. A stretch of output must be longer than 0.5 s.
+  none: no message said that output began or ended (session_output_running)
+Gather summaries: 0. A stretch of output must be longer than 0.5 s.
+  none: no message said that output began or ended (session_output_running)
+Input summaries: 2. A stretch of input must be longer than 0.5 s.
+  +1 s  input began (message 1)
+  +1 s to +11 s, 10 s  active_devices changed from Mic to Headset (message 6) -> Input Summary 1 of
+    2, event 1; made of messages 1, 2, 3, 4, 5 and 6
+  +11 s to +11.5 s, 0.5 s  active_devices changed from Headset to Mic (message 7) -> no summary: 0.5
+    s is not longer than 0.5 s
+  +11.5 s to +12.5 s, 1 s  input stopped (message 8) -> Input Summary 2 of 2, event 2; made of
+    messages 7 and 8
+  +20 s  input began (message 9)
+  +20 s to +20.5 s, 0.5 s  input stopped (message 10) -> no summary: 0.5 s is not longer than 0.5 s
+
+What was forwarded of it is not known: the store does not record sendings by session.
+--------

@@ -1,0 +1,85 @@
+// SPDX-License-Identifier: Apache-2.0
+#include <filesystem>
+#include <gmock/gmock.h>
+#include <string>
+
+#include "support/reports/ReportViews.h"
+#include "tools/twctl/CommandLineTest.h"
+
+namespace tonewerk {
+namespace {
+
+using testing::HasSubstr;
+using testing::IsEmpty;
+using testing::StartsWith;
+
+// Runs twctl with a store and without a journal.
+class SessionCommandTest : public CommandLineTest {
+ protected:
+  SessionCommandTest() {
+    std::filesystem::create_directories(directory_.path("state"));
+    ReportViews views(directory_.path("state") + "/reports.db");
+    views.played(2, "Melody\x1b[31m", 1'795'132'800.0, 3600.0, "Speaker", 0.5);
+    views.overloaded(2, 1'795'132'810.0, 256);
+    views.run(
+        "INSERT INTO event VALUES (7, 1795136400.0, 2, 'Volume', 'Summary', 'derived', "
+        "'{\"msgidx\":1}'), (8, 1795136400.0, NULL, 'Volume', 'Generic', 'client', '{}')");
+  }
+};
+
+TEST_F(SessionCommandTest, TellsWhatTheStoreKnowsWithoutAJournal) {
+  EXPECT_EQ(run({"session", "2"}), kDone) << errors();
+  EXPECT_THAT(output(),
+              StartsWith("Session 2: Melody\\u001b[31m (process player, user 1000) for longformaudio, "
+                         "reporter 1002.\n"
+                         "It began at 2026-11-20T00:00:00Z and ended at 2026-11-20T01:00:00Z, after "
+                         "1:00:00: it was stopped.\n"
+                         "10 messages, 2 of them redundant; 0 overloads; 3600 s active.\n"));
+  EXPECT_THAT(output(), HasSubstr("The reasons are not known: there is no journal.\n"));
+  EXPECT_THAT(output(), HasSubstr("  1  Volume Summary (derived)\n"));
+  EXPECT_THAT(output(), HasSubstr("+0 s to +3600 s, 3600 s  Volume on Speaker at volume 0.5 (event 2)\n"));
+  EXPECT_THAT(output(), HasSubstr("+10 s  overload at mixer, 0.5 s of silence, buffer of 256 frames"));
+}
+
+TEST_F(SessionCommandTest, GivesProgramsAnObjectALine) {
+  EXPECT_EQ(run({"session", "2", "--json"}), kDone);
+  EXPECT_THAT(output(), StartsWith(R"({"id":2,"reporter_id":1002,)"));
+  EXPECT_THAT(output(), HasSubstr("\n{\"what\":\"unknown\",\"why\":\"there is no journal\"}\n"));
+  EXPECT_THAT(output(), HasSubstr(R"({"what":"issue","event":1,"at":1795132810.0,"kind":"overload")"));
+}
+
+TEST_F(SessionCommandTest, SaysWhichSessionIsNotThere) {
+  EXPECT_EQ(run({"session", "12"}), kRefused);
+  EXPECT_EQ(errors(), "twctl: the store has no session 12; `twctl sessions` lists those that there are\n");
+  EXPECT_EQ(run({"session", "1002"}), kRefused);
+  EXPECT_THAT(errors(), HasSubstr("the reporter identifier 1002 is that of these sessions, newest first: 2"));
+  EXPECT_EQ(run({"explain", "--session", "12", "--missing", "volume"}), kRefused);
+  EXPECT_THAT(errors(), HasSubstr("the store has no session 12"));
+  EXPECT_THAT(output(), IsEmpty());
+}
+
+TEST_F(SessionCommandTest, SaysWhichEventIsNotThere) {
+  EXPECT_EQ(run({"explain", "12"}), kRefused);
+  EXPECT_THAT(errors(), HasSubstr("the store has no event 12; it has events from 7 to 8; `twctl sql"));
+  EXPECT_EQ(run({"explain", "8"}), kRefused);
+  EXPECT_THAT(errors(), HasSubstr("event 8 belongs to no session"));
+}
+
+TEST_F(SessionCommandTest, ExplainsWhatItCanAndFails) {
+  EXPECT_EQ(run({"explain", "7"}), kRefused);
+  EXPECT_EQ(output(),
+            "Event 7: Volume Summary of session 2, recorded at 2026-11-20T01:00:00Z, made by the daemon.\n"
+            "The reasons are not known: there is no journal.\n");
+}
+
+TEST_F(SessionCommandTest, ExplainsOneThingAtATime) {
+  EXPECT_EQ(run({"explain"}), kWrongUsage);
+  EXPECT_EQ(run({"explain", "7", "--session", "2"}), kWrongUsage);
+  EXPECT_EQ(run({"explain", "7", "--missing", "volume"}), kWrongUsage);
+  EXPECT_EQ(run({"explain", "--session", "2"}), kWrongUsage);
+  EXPECT_EQ(run({"explain", "--session", "2", "--missing", "volme"}), kWrongUsage);
+  EXPECT_THAT(errors(), HasSubstr("did you mean 'volume'?"));
+}
+
+}  // namespace
+}  // namespace tonewerk
