@@ -41,6 +41,7 @@ int runCommandLine(int argc, const char* const* argv, Tool& tool) {
   addRtcCommand(app, tool);
   addSessionsCommand(app, tool);
   addSessionCommands(app, tool);
+  addTraceCommand(app, tool);
   addReportCommand(app, tool);
   addSqlCommand(app, tool);
   addExportCommand(app, tool);

@@ -2,7 +2,9 @@
 #include <filesystem>
 #include <gmock/gmock.h>
 #include <string>
+#include <sys/stat.h>
 
+#include "platform/linux/files/TextFile.h"
 #include "support/reports/ReportViews.h"
 #include "tools/twctl/CommandLineTest.h"
 
@@ -79,6 +81,36 @@ TEST_F(SessionCommandTest, ExplainsOneThingAtATime) {
   EXPECT_EQ(run({"explain", "--session", "2"}), kWrongUsage);
   EXPECT_EQ(run({"explain", "--session", "2", "--missing", "volme"}), kWrongUsage);
   EXPECT_THAT(errors(), HasSubstr("did you mean 'volume'?"));
+}
+
+class TraceCommandTest : public SessionCommandTest {};
+
+TEST_F(TraceCommandTest, MakesAFileThatOnlyItsOwnerMayRead) {
+  const std::string file = directory_.path("trace.json");
+  EXPECT_EQ(run({"trace", "--session", "2", "-o", file}), kDone) << errors();
+  std::string text;
+  ASSERT_FALSE(readTextFile(file, text));
+  EXPECT_THAT(text, HasSubstr(R"("name":"Speaker")"));
+  EXPECT_THAT(text, testing::EndsWith("]}\n"));
+  struct stat status {};
+  ASSERT_EQ(stat(file.c_str(), &status), 0);
+  EXPECT_EQ(status.st_mode & 0777U, 0600U);
+}
+
+TEST_F(TraceCommandTest, MakesNoFileForASessionThatIsNotThere) {
+  const std::string file = directory_.path("trace.json");
+  EXPECT_EQ(run({"trace", "--session", "12", "-o", file}), kRefused);
+  EXPECT_THAT(errors(), HasSubstr("the store has no session 12"));
+  EXPECT_FALSE(std::filesystem::exists(file));
+}
+
+TEST_F(TraceCommandTest, LeavesAFileThatExistsAsItIs) {
+  const std::string file = write("trace.json", "mine");
+  EXPECT_EQ(run({"trace", "--session", "2", "-o", file}), kRefused);
+  EXPECT_EQ(errors(), "twctl: " + file + ": it exists already\n");
+  std::string text;
+  ASSERT_FALSE(readTextFile(file, text));
+  EXPECT_EQ(text, "mine");
 }
 
 }  // namespace

@@ -1,0 +1,216 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "tools/twctl/sessions/ChromeTrace.h"
+
+#include <algorithm>
+#include <cmath>
+#include <cstdint>
+#include <optional>
+#include <string_view>
+#include <vector>
+
+#include "values/CompactJson.h"
+#include "values/Value.h"
+
+namespace tonewerk {
+namespace {
+
+constexpr double kMicrosecondsPerSecond = 1e6;
+constexpr std::int64_t kProcess = 1;
+
+enum Thread : std::int64_t {
+  kSession = 1,
+  kPlaying,
+  kRecording,
+  kGroupSession,
+  kOutputDevice,
+  kInputDevice,
+  kIssues,
+};
+
+struct NamedThread {
+  Thread thread;
+  std::string_view name;
+};
+constexpr NamedThread kThreads[] = {{kSession, "session"},
+                                    {kPlaying, "playing"},
+                                    {kRecording, "recording"},
+                                    {kGroupSession, "group session"},
+                                    {kOutputDevice, "output device"},
+                                    {kInputDevice, "input device"},
+                                    {kIssues, "issues"}};
+
+Thread threadOf(const SessionRecords::Stretch& stretch) {
+  if (stretch.category == "Input") return kRecording;
+  return stretch.category == "Gather" ? kGroupSession : kPlaying;
+}
+
+class TraceWriter {
+ public:
+  TraceWriter(const StoredSession& session, const SessionRecords& records)
+      : session_(session), records_(records) {
+    begin_ = session.startedAt;
+    end_ = session.endedAt.value_or(begin_);
+    for (const SessionRecords::Stretch& stretch : records.stretches) {
+      if (!stretch.from || !stretch.until) continue;
+      begin_ = std::min(begin_, *stretch.from);
+      if (!session.endedAt) end_ = std::max(end_, *stretch.until);
+    }
+    for (const SessionRecords::Issue& issue : records.issues) {
+      begin_ = std::min(begin_, issue.at);
+      if (!session.endedAt) end_ = std::max(end_, issue.at);
+    }
+  }
+
+  std::string text() {
+    addSession();
+    for (const SessionRecords::Stretch& stretch : records_.stretches) {
+      if (stretch.from && stretch.until) addStretch(stretch);
+    }
+    addDevices(kOutputDevice);
+    addDevices(kInputDevice);
+    addVolume();
+    for (const SessionRecords::Issue& issue : records_.issues) addIssue(issue);
+    return written();
+  }
+
+ private:
+  struct Event {
+    std::int64_t at = 0;
+    std::int64_t duration = 0;
+    ValueMap json;
+  };
+
+  std::int64_t timeOf(double seconds) const {
+    return std::llround((seconds - begin_) * kMicrosecondsPerSecond);
+  }
+
+  void add(ValueMap json, std::string_view phase, std::int64_t at, Thread thread, ValueMap arguments) {
+    json.set("ph", phase);
+    json.set("ts", at);
+    json.set("pid", kProcess);
+    json.set("tid", static_cast<std::int64_t>(thread));
+    if (!arguments.empty()) json.set("args", std::move(arguments));
+    events_.push_back({at, json.integer("dur"), std::move(json)});
+  }
+
+  void addSlice(const std::string& name, Thread thread, double from, double until, ValueMap arguments) {
+    const std::int64_t at = timeOf(from);
+    const std::int64_t duration = std::max<std::int64_t>(0, timeOf(until) - at);
+    add({{"name", name}, {"cat", "session"}, {"dur", duration}}, "X", at, thread, std::move(arguments));
+  }
+
+  void addSession() {
+    ValueMap facts{{"session", session_.id}, {"reporter", session_.reporterID}, {"user", session_.user}};
+    if (session_.ending) facts.set("ending", *session_.ending);
+    if (session_.messages) facts.set("messages", *session_.messages);
+    if (session_.redundantMessages) facts.set("redundant_messages", *session_.redundantMessages);
+    addSlice(session_.service.value_or("session"), kSession, session_.startedAt, end_, std::move(facts));
+  }
+
+  void addStretch(const SessionRecords::Stretch& stretch) {
+    ValueMap facts{{"event", stretch.event}, {"seconds", stretch.seconds}};
+    if (stretch.device) facts.set("device", *stretch.device);
+    if (stretch.volume) facts.set("volume", *stretch.volume);
+    addSlice(stretch.category, threadOf(stretch), *stretch.from, *stretch.until, std::move(facts));
+  }
+
+  // One slice for stretches on the same device that follow one another without a pause.
+  void addDevices(Thread thread) {
+    struct Use {
+      std::string device;
+      double from;
+      double until;
+    };
+    std::optional<Use> use;
+    const auto end = [&] {
+      if (use) addSlice(use->device, thread, use->from, use->until, {});
+      use.reset();
+    };
+    for (const SessionRecords::Stretch& stretch : records_.stretches) {
+      const Thread wanted = thread == kOutputDevice ? kPlaying : kRecording;
+      if (threadOf(stretch) != wanted || !stretch.device || !stretch.from || !stretch.until) continue;
+      const bool goesOn =
+          use && use->device == *stretch.device && timeOf(use->until) == timeOf(*stretch.from);
+      if (!goesOn) {
+        end();
+        use = {*stretch.device, *stretch.from, *stretch.until};
+      }
+      use->until = *stretch.until;
+    }
+    end();
+  }
+
+  void addVolume() {
+    std::optional<std::int64_t> silentFrom;
+    const auto count = [this](std::int64_t at, double volume) {
+      add({{"name", "volume"}, {"cat", "session"}}, "C", at, kPlaying, {{"volume", volume}});
+    };
+    for (const SessionRecords::Stretch& stretch : records_.stretches) {
+      if (!stretch.volume || !stretch.from || !stretch.until) continue;
+      const std::int64_t from = timeOf(*stretch.from);
+      if (silentFrom && *silentFrom != from) count(*silentFrom, 0.0);
+      count(from, *stretch.volume);
+      silentFrom = timeOf(*stretch.until);
+    }
+    if (silentFrom) count(*silentFrom, 0.0);
+  }
+
+  void addIssue(const SessionRecords::Issue& issue) {
+    ValueMap facts{{"event", issue.event}};
+    if (issue.node) facts.set("node", *issue.node);
+    if (issue.seconds) facts.set("silent_seconds", *issue.seconds);
+    if (issue.frames) facts.set("buffer_frames", *issue.frames);
+    add({{"name", issue.kind}, {"cat", "issue"}, {"s", "t"}}, "i", timeOf(issue.at), kIssues,
+        std::move(facts));
+  }
+
+  void appendName(std::string& text, const char* what, std::int64_t thread, const std::string& name) const {
+    appendCompactJson(text, ValueMap{{"name", what},
+                                     {"ph", "M"},
+                                     {"pid", kProcess},
+                                     {"tid", thread},
+                                     {"ts", 0},
+                                     {"args", ValueMap{{"name", name}}}});
+    text += ",\n";
+  }
+
+  // In the order of the times; of slices that begin together the longest first, which holds the others.
+  std::string written() {
+    std::stable_sort(events_.begin(), events_.end(), [](const Event& a, const Event& b) {
+      return a.at != b.at ? a.at < b.at : a.duration > b.duration;
+    });
+    std::string text = "{\"displayTimeUnit\":\"ms\",\"otherData\":";
+    appendCompactJson(text, ValueMap{{"session", session_.id},
+                                     {"zero", tonewerk::textOf(Date{begin_})},
+                                     {"zero_seconds_since_1970", begin_}});
+    text += ",\"traceEvents\":[\n";
+    appendName(text, "process_name", 0,
+               "session " + std::to_string(session_.id) + ": " +
+                   session_.application.value_or("unknown application"));
+    for (const NamedThread& thread : kThreads) {
+      const bool isUsed = std::any_of(events_.begin(), events_.end(), [&](const Event& event) {
+        return event.json.integer("tid") == thread.thread;
+      });
+      if (isUsed) appendName(text, "thread_name", thread.thread, std::string(thread.name));
+    }
+    for (std::size_t at = 0; at < events_.size(); ++at) {
+      appendCompactJson(text, events_[at].json);
+      text += at + 1 < events_.size() ? ",\n" : "\n";
+    }
+    return text + "]}\n";
+  }
+
+  const StoredSession& session_;
+  const SessionRecords& records_;
+  double begin_ = 0.0;
+  double end_ = 0.0;
+  std::vector<Event> events_;
+};
+
+}  // namespace
+
+std::string chromeTrace(const StoredSession& session, const SessionRecords& records) {
+  return TraceWriter(session, records).text();
+}
+
+}  // namespace tonewerk

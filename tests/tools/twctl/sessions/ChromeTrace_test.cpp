@@ -1,0 +1,134 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "tools/twctl/sessions/ChromeTrace.h"
+
+#include <gmock/gmock.h>
+#include <map>
+#include <string>
+#include <vector>
+
+#include "platform/linux/json/NlohmannJsonService.h"
+#include "values/Value.h"
+
+namespace tonewerk {
+namespace {
+
+using testing::ElementsAre;
+using testing::HasSubstr;
+using testing::Not;
+
+constexpr double kBegin = 1'763'633'880.25;
+
+class ChromeTraceTest : public testing::Test {
+ protected:
+  ChromeTraceTest() {
+    played(0.0, 3.0, "Speaker", 0.5);
+    played(3.0, 10.0, "Speaker", 0.25);
+    played(12.0, 20.0, "Headphones", 0.75);
+    records_.stretches.push_back({4, "Input", kBegin + 1.0, kBegin + 4.0, 3.0, "Microphone", {}});
+    records_.issues.push_back({5, kBegin + 2.5, "overload", "mixer", 0.5, 256});
+  }
+
+  void played(double from, double until, const std::string& device, double volume) {
+    records_.stretches.push_back({static_cast<std::int64_t>(records_.stretches.size()) + 1, "Volume",
+                                  kBegin + from, kBegin + until, until - from, device, volume});
+  }
+
+  ValueMap trace() const {
+    const NlohmannJsonService json;
+    std::string problem;
+    const auto value = json.parse(chromeTrace(session_, records_), problem);
+    EXPECT_TRUE(value) << problem;
+    return value && value->asMap() != nullptr ? *value->asMap() : ValueMap();
+  }
+  // The events of a phase as "name ts[+dur][ =volume]".
+  std::vector<std::string> events(const std::string& phase) const {
+    std::vector<std::string> found;
+    const ValueMap all = trace();
+    for (const Value& value : *all.find("traceEvents")->asArray()) {
+      const ValueMap& event = *value.asMap();
+      if (event.text("ph") != phase) continue;
+      found.push_back(event.text("name") + " " + event.text("ts"));
+      if (event.contains("dur")) found.back() += "+" + event.text("dur");
+      if (phase == "C") found.back() += " =" + event.find("args")->asMap()->text("volume");
+    }
+    return found;
+  }
+
+  StoredSession session_{.id = 41,
+                         .reporterID = 7,
+                         .service = "longformaudio",
+                         .application = "org.example.\"Player\"\n",
+                         .user = 1000,
+                         .startedAt = kBegin,
+                         .endedAt = kBegin + 21.0,
+                         .ending = "stopped"};
+  SessionRecords records_;
+};
+
+// The rules of the format: which fields each phase needs, and what viewers expect of them.
+TEST_F(ChromeTraceTest, KeepsTheRulesOfTheFormat) {
+  const ValueMap all = trace();
+  double last = 0.0;
+  std::map<std::int64_t, double> busyUntil;  // by thread
+  std::map<std::int64_t, std::string> threads;
+  for (const Value& value : *all.find("traceEvents")->asArray()) {
+    ASSERT_NE(value.asMap(), nullptr);
+    const ValueMap& event = *value.asMap();
+    const std::string phase = event.text("ph");
+    for (const char* field : {"name", "ph", "ts", "pid", "tid"}) EXPECT_TRUE(event.contains(field)) << field;
+    EXPECT_THAT(phase, testing::AnyOf("M", "X", "C", "i"));
+    const double at = event.number("ts");
+    EXPECT_GE(at, last) << "not sorted";
+    last = at;
+    const std::int64_t thread = event.integer("tid");
+    if (phase == "M") {
+      ASSERT_TRUE(event.contains("args"));
+      EXPECT_NE(event.find("args")->asMap()->text("name"), "");
+      threads[thread] = event.find("args")->asMap()->text("name");
+      continue;
+    }
+    EXPECT_TRUE(threads.contains(thread)) << "thread without a name";
+    if (phase == "X") {
+      ASSERT_TRUE(event.contains("dur"));
+      EXPECT_GE(event.number("dur"), 0.0);
+      EXPECT_GE(at, busyUntil[thread]) << "slices of one thread overlap";
+      busyUntil[thread] = at + event.number("dur");
+    }
+    if (phase == "i") EXPECT_EQ(event.text("s"), "t");
+    if (phase == "C") EXPECT_NE(event.find("args")->asMap()->find("volume")->asDouble(), nullptr);
+  }
+  EXPECT_EQ(threads.at(0), "session 41: org.example.\"Player\"\n");
+}
+
+TEST_F(ChromeTraceTest, HasASliceForEachStretchAndDevice) {
+  EXPECT_THAT(events("X"),
+              ElementsAre("longformaudio 0+21000000", "Speaker 0+10000000", "Volume 0+3000000",
+                          "Input 1000000+3000000", "Microphone 1000000+3000000", "Volume 3000000+7000000",
+                          "Volume 12000000+8000000", "Headphones 12000000+8000000"));
+}
+
+TEST_F(ChromeTraceTest, CountsTheVolumeWhichIsNothingWhileNothingPlays) {
+  EXPECT_THAT(events("C"), ElementsAre("volume 0 =0.5", "volume 3000000 =0.25", "volume 10000000 =0",
+                                       "volume 12000000 =0.75", "volume 20000000 =0"));
+}
+
+TEST_F(ChromeTraceTest, MarksIssues) { EXPECT_THAT(events("i"), ElementsAre("overload 2500000")); }
+
+TEST_F(ChromeTraceTest, BeginsWithAStretchThatBeganBeforeTheSession) {
+  played(-2.0, -1.0, "Speaker", 0.5);
+  EXPECT_THAT(events("X"), testing::Contains("longformaudio 2000000+21000000"));
+  EXPECT_THAT(events("i"), ElementsAre("overload 4500000"));
+}
+
+TEST_F(ChromeTraceTest, LetsARunningSessionLastUntilWhatIsKnown) {
+  session_.endedAt.reset();
+  EXPECT_THAT(events("X"), testing::Contains("longformaudio 0+20000000"));
+}
+
+TEST_F(ChromeTraceTest, LeavesOutStretchesWithoutTimes) {
+  records_.stretches.push_back({9, "Gather", {}, kBegin, 1.0, "Speaker", {}});
+  EXPECT_THAT(chromeTrace(session_, records_), Not(HasSubstr("Gather")));
+}
+
+}  // namespace
+}  // namespace tonewerk
