@@ -184,6 +184,20 @@ TEST(RedundancyStoryTest, SaysWhichMessageARedundantOneRepeats) {
   EXPECT_THAT(earlier, testing::HasSubstr("repeated it and"));
 }
 
+TEST(RedundancyStoryTest, KnowsAllMessagesThatAreEqual) {
+  const Played played(kSource / "tests/recordings/redundancy.jsonl");
+  const ReasonedLife& life = played.lives().front();
+  const auto numbersEqualTo = [&life](std::int64_t number) {
+    std::vector<std::int64_t> numbers;
+    for (const ValueMap* message : life.equalTo(number)) numbers.push_back(message->integer("number"));
+    return numbers;
+  };
+  EXPECT_THAT(numbersEqualTo(1), testing::ElementsAre(1, 2));
+  EXPECT_THAT(numbersEqualTo(2), testing::ElementsAre(1, 2));
+  EXPECT_THAT(numbersEqualTo(5), testing::ElementsAre(5));
+  EXPECT_THAT(numbersEqualTo(99), testing::IsEmpty());
+}
+
 TEST(RedundancyStoryTest, SaysThatNothingRan) {
   Played played(kSource / "tests/recordings/redundancy.jsonl");
   std::string text;

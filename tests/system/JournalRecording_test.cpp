@@ -245,6 +245,14 @@ TEST_F(JournalRecordingTest, OneSessionTellsItsReasons) {
   EXPECT_THAT(story, Not(HasSubstr("number=1")));
   EXPECT_THAT(twctl({"explain", "--session", "1", "--missing", "input"}, ownState()),
               HasSubstr("none: no message said that input began or ended (session_input_running)\n"));
+  const std::string equal = twctl({"explain", "--json", "--session", "1", "--message", "3"}, ownState());
+  EXPECT_THAT(equal, HasSubstr(R"("number":2,)"));
+  EXPECT_THAT(equal, HasSubstr(R"("number":3,)"));
+  EXPECT_THAT(equal, Not(HasSubstr(R"("number":1,)")));
+  constexpr const char* kSummary = "Volume Summary 1 of 2, event ";
+  const std::size_t event = story.find(kSummary) + std::string_view(kSummary).size();
+  EXPECT_THAT(twctl({"explain", story.substr(event, story.find(';', event) - event)}, ownState()),
+              HasSubstr("A stretch of output gave it, because it was longer than 0.5 s:\n"));
   EXPECT_THAT(twctl({"session", "2"}, ownState()), HasSubstr("Playback Start: number=1\n"));
 }
 

@@ -56,19 +56,25 @@ void printLine(Tool& tool, const ValueMap& line) {
   tool.out << printable(std::move(text)) << '\n';
 }
 
+void printUnknown(Tool& tool, const KnownSession& known) {
+  printLine(tool, {{reasons::kWhat, "unknown"}, {"why", known.replay.why()}});
+}
+
+void printWalk(Tool& tool, const ReasonedLife::Walk& walk) {
+  printLine(tool, walk.about);
+  for (const ValueMap& step : walk.steps) printLine(tool, step);
+  printLine(tool, walk.end);
+}
+
 // One object a line: the session, then what happened in it, with the keys of the reasons.
 void printObjects(Tool& tool, const KnownSession& known) {
   SessionsTable(tool.out, true, known.session.endedAt.value_or(known.session.startedAt), std::nullopt)
       .add(known.session);
   if (known.life == nullptr) {
-    printLine(tool, {{reasons::kWhat, "unknown"}, {"why", known.replay.why()}});
+    printUnknown(tool, known);
   } else {
     for (const ValueMap& message : known.life->messages) printLine(tool, message);
-    for (const ReasonedLife::Walk& walk : known.life->walks) {
-      printLine(tool, walk.about);
-      for (const ValueMap& step : walk.steps) printLine(tool, step);
-      printLine(tool, walk.end);
-    }
+    for (const ReasonedLife::Walk& walk : known.life->walks) printWalk(tool, walk);
     if (known.life->end) printLine(tool, *known.life->end);
   }
   for (const SessionRecords::Issue& issue : known.records.issues) {
@@ -110,6 +116,21 @@ std::string problemWithMissing(const std::string& word) {
   return "'" + word + "' is no kind of summary; " + hintFor(word, {"volume", "input", "gather"});
 }
 
+// The reasons of an event, one object a line.
+void printObjects(Tool& tool, const KnownSession& known, const StoredEventRow& event) {
+  const ValueMap* end = event.isSummary() ? known.life->summaryEnd(event.category, *event.summary) : nullptr;
+  if (end != nullptr) {
+    printLine(tool, known.life->walk(event.category)->about);
+    printLine(tool, *end);
+    for (const Value& number : *end->find(reasons::kMessages)->asArray()) {
+      if (const ValueMap* message = known.life->message(number.integer())) printLine(tool, *message);
+    }
+  } else if (const ValueMap* message = known.life->messageOf(event)) {
+    for (const ValueMap* equal : known.life->equalTo(message->integer(reasons::kNumber)))
+      printLine(tool, *equal);
+  }
+}
+
 int explainEvent(Tool& tool, SqlReader& reader, std::int64_t id) {
   std::string problem;
   const std::optional<StoredEventRow> event = readEvent(reader, id, problem);
@@ -118,7 +139,13 @@ int explainEvent(Tool& tool, SqlReader& reader, std::int64_t id) {
     return tool.fail(kRefused, "event " + std::to_string(id) + " belongs to no session, so no rule is known");
   KnownSession known;
   if (!find(tool, reader, *event->session, known)) return tool.status;
-  tool.out << printableLines(storyOf(tool, known).event(*event));
+  if (!tool.asJson) {
+    tool.out << printableLines(storyOf(tool, known).event(*event));
+  } else if (known.life == nullptr) {
+    printUnknown(tool, known);
+  } else {
+    printObjects(tool, known, *event);
+  }
   return known.life == nullptr ? kRefused : kDone;
 }
 
@@ -126,14 +153,22 @@ int explainOfSession(Tool& tool, SqlReader& reader, const ExplainOptions& option
   KnownSession known;
   if (!find(tool, reader, *options.session, known)) return tool.status;
   const SessionStory story = storyOf(tool, known);
-  const std::string text =
-      options.message ? story.message(*options.message) : story.summaries(categoryOf(options.missing));
+  const std::string category = categoryOf(options.missing);
+  const std::string text = options.message ? story.message(*options.message) : story.summaries(category);
   if (text.empty()) {
     return tool.fail(kRefused, "session " + std::to_string(*options.session) + " has no message " +
                                    std::to_string(*options.message) + "; `twctl session " +
                                    std::to_string(*options.session) + "` lists them");
   }
-  tool.out << printableLines(text);
+  if (!tool.asJson) {
+    tool.out << printableLines(text);
+  } else if (known.life == nullptr) {
+    printUnknown(tool, known);
+  } else if (options.message) {
+    for (const ValueMap* equal : known.life->equalTo(*options.message)) printLine(tool, *equal);
+  } else if (const ReasonedLife::Walk* walk = known.life->walk(category)) {
+    printWalk(tool, *walk);
+  }
   return known.life == nullptr ? kRefused : kDone;
 }
 

@@ -43,7 +43,7 @@ void sessions(Tool& tool, const SessionsOptions& options) {
 void addSessionsCommand(CLI::App& app, Tool& tool) {
   CLI::App& command = addCommand(app, tool, "sessions", "The sessions in the store, the newest last");
   command.footer(
-      "A narrow terminal gets fewer columns. A pattern (GLOB) may have *, ? and [...]. " +
+      "A narrow terminal gets fewer columns. A pattern (GLOB) may have *, ? and [...].\n" +
       std::string(TimeRangeOptions::kForms) +
       "\n`twctl session ID` tells what happened in one. The store is read whether a daemon runs or not.");
   const auto options = std::make_shared<SessionsOptions>();

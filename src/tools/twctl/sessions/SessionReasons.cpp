@@ -16,6 +16,13 @@ namespace {
 constexpr double kSameTime = 0.001;
 
 // False for a line that has no known meaning there.
+bool takeOfWalk(const std::string& what, const ValueMap& line, ReasonedLife::Walk& walk) {
+  const bool isStep = what == reasons::kRapid || what == reasons::kStretch || what == reasons::kStretchEnd;
+  if (isStep) walk.steps.push_back(line);
+  if (what == reasons::kWalkEnd) walk.end = line;
+  return isStep || what == reasons::kWalkEnd;
+}
+
 bool take(const ValueMap& line, ReasonedLife& life) {
   const std::string what = line.text(reasons::kWhat);
   if (what == reasons::kBegin) {
@@ -29,14 +36,8 @@ bool take(const ValueMap& line, ReasonedLife& life) {
     life.walks.push_back({.about = line, .steps = {}, .end = {}});
   } else if (what == reasons::kEnd) {
     life.end = line;
-  } else if (life.walks.empty()) {
-    return false;
-  } else if (what == reasons::kWalkEnd) {
-    life.walks.back().end = line;
-  } else if (what == reasons::kRapid || what == reasons::kStretch || what == reasons::kStretchEnd) {
-    life.walks.back().steps.push_back(line);
   } else {
-    return false;
+    return !life.walks.empty() && takeOfWalk(what, line, life.walks.back());
   }
   return true;
 }
@@ -46,6 +47,39 @@ bool take(const ValueMap& line, ReasonedLife& life) {
 const ValueMap* ReasonedLife::message(std::int64_t number) const {
   const auto found = std::find_if(messages.begin(), messages.end(), [number](const ValueMap& message) {
     return message.integer(reasons::kNumber) == number;
+  });
+  return found == messages.end() ? nullptr : &*found;
+}
+
+std::vector<const ValueMap*> ReasonedLife::equalTo(std::int64_t number) const {
+  const ValueMap* asked = message(number);
+  const bool isRedundant = asked != nullptr && asked->boolean(reasons::kRedundant);
+  const std::int64_t first = isRedundant ? asked->integer(reasons::kRepeats) : number;
+  std::vector<const ValueMap*> found;
+  for (const ValueMap& message : messages) {
+    const bool isFirst = message.integer(reasons::kNumber) == first && first != 0;
+    const bool repeatsIt =
+        message.boolean(reasons::kRedundant) && message.integer(reasons::kRepeats) == first;
+    if (isFirst || (repeatsIt && first != 0) || &message == asked) found.push_back(&message);
+  }
+  return found;
+}
+
+const ValueMap* ReasonedLife::summaryEnd(const std::string& category, std::int64_t index) const {
+  const Walk* found = walk(category);
+  if (found == nullptr) return nullptr;
+  const auto given = std::find_if(found->steps.begin(), found->steps.end(), [index](const ValueMap& step) {
+    return step.contains(reasons::kIndex) && step.integer(reasons::kIndex) == index;
+  });
+  return given == found->steps.end() ? nullptr : &*given;
+}
+
+const ValueMap* ReasonedLife::messageOf(const StoredEventRow& event) const {
+  constexpr double kSameSeconds = 1e-4;
+  const auto found = std::find_if(messages.begin(), messages.end(), [&](const ValueMap& message) {
+    return message.text(reasons::kCategory) == event.category && message.text(reasons::kType) == event.type &&
+           !message.boolean(reasons::kRedundant) && event.sentAt &&
+           std::abs(message.number(reasons::kAt) - *event.sentAt) < kSameSeconds;
   });
   return found == messages.end() ? nullptr : &*found;
 }
@@ -71,6 +105,7 @@ std::optional<std::vector<ReasonedLife>> readReasons(std::istream& text, const J
     }
   }
   std::vector<ReasonedLife> all;
+  all.reserve(lives.size());
   for (auto& [place, life] : lives) all.push_back(std::move(life));
   return all;
 }

@@ -7,6 +7,7 @@
 #include <string>
 #include <vector>
 
+#include "tools/twctl/sessions/SessionRecords.h"
 #include "tools/twctl/sessions/StoredSessions.h"
 #include "values/Value.h"
 
@@ -34,6 +35,12 @@ struct ReasonedLife {
 
   // Null when there is no such message.
   const ValueMap* message(std::int64_t number) const;
+  // The message, the one that it repeats, and those that repeat the same one, in order.
+  std::vector<const ValueMap*> equalTo(std::int64_t number) const;
+  // The "stretchEnd" that gave the summary with this number; null when there was none.
+  const ValueMap* summaryEnd(const std::string& category, std::int64_t index) const;
+  // The message that the store has as this event; null when it is not known.
+  const ValueMap* messageOf(const StoredEventRow& event) const;
   // The walk for the summaries of this category; null when there was none.
   const Walk* walk(const std::string& category) const;
 };

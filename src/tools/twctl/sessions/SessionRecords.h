@@ -59,6 +59,9 @@ struct StoredEventRow {
   std::string source;
   std::optional<double> sentAt;         // what the message says of its time
   std::optional<std::int64_t> summary;  // its number among the summaries of its category
+
+  // Whether it may be the summary of a stretch.
+  bool isSummary() const { return source != "client" && type == "Summary" && summary; }
 };
 
 // None when there is no such event, or when the store cannot be read; `problem` then says what was not found

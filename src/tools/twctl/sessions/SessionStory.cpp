@@ -59,7 +59,7 @@ std::string whatRuns(const ReasonedLife::Walk& walk) {
 }
 
 std::string endingText(const StoredSession& session) {
-  const std::string ending = session.ending.value_or("");
+  std::string ending = session.ending.value_or("");
   if (ending == "stopped") return "it was stopped";
   if (ending == "replaced") return "a session of the same client for another service replaced it";
   if (ending == "disconnected") return "its client had gone";
@@ -380,30 +380,22 @@ std::string SessionStory::event(const StoredEventRow& event) const {
     unknownReasons(text);
     return text;
   }
-  const ReasonedLife::Walk* walk = event.source == "client" ? nullptr : life_->walk(event.category);
-  if (walk != nullptr && event.summary && event.type == "Summary") {
-    for (const ValueMap& step : walk->steps) {
-      if (step.integer(reasons::kIndex) != *event.summary || !step.contains(reasons::kIndex)) continue;
-      add(text, "A stretch of " + whatRuns(*walk) + " gave it, because it was longer than " +
-                    secondsText(walk->about.number(reasons::kMinimum)) + ":");
-      this->step(text, *walk, step);
-      const Value* numbers = step.find(reasons::kMessages);
-      for (const Value& number : *numbers->asArray()) {
-        if (const ValueMap* message = life_->message(number.integer()))
-          add(text, std::string(kIndent, ' ') + messageLine(*message), 2 * kIndent);
-      }
-      return text;
+  const ValueMap* end = event.isSummary() ? life_->summaryEnd(event.category, *event.summary) : nullptr;
+  if (end != nullptr) {
+    const ReasonedLife::Walk& walk = *life_->walk(event.category);
+    add(text, "A stretch of " + whatRuns(walk) + " gave it, because it was longer than " +
+                  secondsText(walk.about.number(reasons::kMinimum)) + ":");
+    step(text, walk, *end);
+    for (const Value& number : *end->find(reasons::kMessages)->asArray()) {
+      if (const ValueMap* message = life_->message(number.integer()))
+        add(text, std::string(kIndent, ' ') + messageLine(*message), 2 * kIndent);
     }
+    return text;
   }
-  constexpr double kSameTime = 1e-4;
-  for (const ValueMap& message : life_->messages) {
-    const bool isIt = message.text(reasons::kCategory) == event.category &&
-                      message.text(reasons::kType) == event.type && !message.boolean(reasons::kRedundant) &&
-                      event.sentAt && std::abs(message.number(reasons::kAt) - *event.sentAt) < kSameTime;
-    if (!isIt) continue;
-    add(text, "It is message " + messageLine(message) + ".", kIndent);
+  if (const ValueMap* message = life_->messageOf(event)) {
+    add(text, "It is message " + messageLine(*message) + ".", kIndent);
     add(text, "It was recorded, because it repeated no earlier message of its category and type. " +
-                  repeatedBy(message.integer(reasons::kNumber)));
+                  repeatedBy(message->integer(reasons::kNumber)));
     return text;
   }
   add(text, "No rule told anything about it when the session was played again.");
