@@ -17,6 +17,7 @@
 #include "tools/twctl/show/Table.h"
 #include "tools/twctl/sql/SqlRun.h"
 #include "tools/twctl/sql/StoreNames.h"
+#include "values/ClosestName.h"
 #include "values/Value.h"
 
 namespace tonewerk {

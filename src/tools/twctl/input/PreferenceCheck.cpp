@@ -7,6 +7,7 @@
 #include "platform/linux/store/AnalyticsConsumers.h"
 #include "platform/linux/store/StoreMetricon.h"
 #include "tools/twctl/input/Suggestion.h"
+#include "values/ClosestName.h"
 
 namespace tonewerk {
 namespace {

@@ -5,6 +5,7 @@
 #include <vector>
 
 #include "tools/twctl/input/Suggestion.h"
+#include "values/ClosestName.h"
 
 namespace tonewerk {
 namespace {

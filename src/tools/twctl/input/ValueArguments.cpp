@@ -9,6 +9,7 @@
 
 #include "protocol/EventTexts.h"
 #include "tools/twctl/input/Suggestion.h"
+#include "values/ClosestName.h"
 
 namespace tonewerk {
 namespace {

@@ -9,6 +9,7 @@
 
 #include "tools/twctl/input/Suggestion.h"
 #include "tools/twctl/sql/StoreNames.h"
+#include "values/ClosestName.h"
 #include "values/PrintableText.h"
 #include "values/Utf8.h"
 
