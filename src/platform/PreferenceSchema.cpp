@@ -6,10 +6,13 @@
 #include <cstdint>
 #include <limits>
 
+#include "values/ClosestName.h"
+
 namespace tonewerk {
 namespace {
 
 using enum PreferenceType;
+using enum PreferenceEffect;
 
 constexpr double kMaxInt32 = std::numeric_limits<std::int32_t>::max();
 
@@ -28,46 +31,69 @@ std::vector<Preference> allPreferences() {
   const Value memoryTools = ValueArray{"tw-memory-usage", "slabtop --once"};
   return {
       {kMetricon, "consumers", kTables, everything, "Who asks for which analytics events"},
-      {kLinkReport, "backends", kTexts, ValueArray{"local"}, "Where messages go: local, or addresses"},
+      {kLinkReport, "backends", kTexts, ValueArray{"local"}, "Where messages go: local, or addresses",
+       kNextSession},
       {kLinkReport, "device_id", kText, {}, "The device's name for receivers; unnamed without"},
-      {kLinkReport, "event_name_attribute", kBoolean, false, "Event names as an attribute, too"},
-      {kStore, "max_megabytes", kNumber, 256, "MiB that the store takes, its log included", 1.0},
-      {kStore, "max_days", kNumber, 30, "Age of the oldest report in days", 1.0},
-      {kStore, "journal_megabytes", kNumber, 64, "MiB of requests kept to outlive a crash", 0.0},
-      {kStore, "journal_sync_seconds", kNumber, 5, "Seconds until a request is on the disk", 0.0, 3600.0},
-      {kStore, "journal_days", kNumber, 0, "Days that requests are kept for replay", 0.0},
-      {kService, "trusted_users", kUsers, ValueArray{}, "Who reaches all users' sessions, beside root"},
-      {kService, "unfinished_megabytes", kNumber, 128, "MiB of requests under way, of all users", 1.0},
-      {kService, "kept_megabytes", kNumber, 512, "MiB that sessions keep, of all users", 1.0},
-      {kService, "snapshot_megabytes", kNumber, 64, "MiB of driver statistics, of all users", 1.0},
-      {kDiagnostics, "max_megabytes", kNumber, 256, "MiB of captures, drafts and stall traces", 1.0},
-      {kDiagnostics, "max_items", kNumber, 500, "How many of them are kept", 1.0},
+      {kLinkReport, "event_name_attribute", kBoolean, false, "Event names as an attribute, too",
+       kNextSession},
+      {kStore, "max_megabytes", kNumber, 256, "MiB that the store takes, its log included", kAtOnce, "MiB",
+       1.0},
+      {kStore, "max_days", kNumber, 30, "Age of the oldest report in days", kAtOnce, "days", 1.0},
+      {kStore, "journal_megabytes", kNumber, 64, "MiB of requests kept to outlive a crash", kAtOnce, "MiB",
+       0.0},
+      {kStore, "journal_sync_seconds", kNumber, 5, "Seconds until a request is on the disk", kAtOnce,
+       "seconds", 0.0, 3600.0},
+      {kStore, "journal_days", kNumber, 0, "Days that requests are kept for replay", kAtOnce, "days", 0.0},
+      {kService, "trusted_users", kUsers, ValueArray{}, "Who reaches all users' sessions, beside root",
+       kReload},
+      {kService, "unfinished_megabytes", kNumber, 128, "MiB of requests under way, of all users", kReload,
+       "MiB", 1.0},
+      {kService, "kept_megabytes", kNumber, 512, "MiB that sessions keep, of all users", kReload, "MiB", 1.0},
+      {kService, "snapshot_megabytes", kNumber, 64, "MiB of driver statistics, of all users", kReload, "MiB",
+       1.0},
+      {kDiagnostics, "max_megabytes", kNumber, 256, "MiB of captures, drafts and stall traces", kAtOnce,
+       "MiB", 1.0},
+      {kDiagnostics, "max_items", kNumber, 500, "How many of them are kept", kAtOnce, {}, 1.0},
       {kTwreporting,
        "VidroInvalidXyBackOffSeconds",
        kNumber,
        {},
        "Seconds between two drafts; off without",
+       kNextSession,
+       "seconds",
        0.0},
-      {kTwreporting, "enable_whirlcap", kBoolean, false, "Whether overloads have stall traces made"},
-      {kTwreporting, "io_buffer_size", kInteger, 512, "Smallest buffer that counts, in frames; 0 is 512", 0.0,
+      {kTwreporting, "enable_whirlcap", kBoolean, false, "Whether overloads have stall traces made",
+       kNextSession},
+      {kTwreporting, "io_buffer_size", kInteger, 512, "Smallest buffer that counts, in frames; 0 is 512",
+       kNextSession, "frames", 0.0, kMaxInt32},
+      {kTwreporting,
+       "io_cycle",
+       kInteger,
+       0,
+       "First cycle whose overload counts",
+       kNextSession,
+       {},
+       0.0,
        kMaxInt32},
-      {kTwreporting, "io_cycle", kInteger, 0, "First cycle whose overload counts", 0.0, kMaxInt32},
-      {kTwreporting, "wait_time", kNumber, 0, "Microseconds from an overload to its trace", 0.0,
-       10'000'000.0},
+      {kTwreporting, "wait_time", kNumber, 0, "Microseconds from an overload to its trace", kNextSession,
+       "microseconds", 0.0, 10'000'000.0},
       {.domain = kTwreporting,
        .key = "memory_tools",
        .type = kTexts,
        .fallback = memoryTools,
        .meaning = "The memory log's two commands",
        .count = 2},
-      {kTwreporting, "summary_megabytes", kNumber, 256, "MiB that JSON summary files take", 1.0},
-      {kTwreporting, "summary_days", kNumber, 30, "Age of the oldest JSON summary file in days", 1.0},
+      {kTwreporting, "summary_megabytes", kNumber, 256, "MiB that JSON summary files take", kAtOnce, "MiB",
+       1.0},
+      {kTwreporting, "summary_days", kNumber, 30, "Age of the oldest JSON summary file in days", kAtOnce,
+       "days", 1.0},
       {kTwreporting, "VidroComponentIdentifier", kInteger, 0, "The drafts' component in the bug tracker"},
       {.domain = kTwreporting,
        .key = "VidroInvalidXyIDRlastRun",
        .type = kNumber,
        .fallback = {},
        .meaning = "When the last draft was made, in seconds since 1970",
+       .unit = "seconds",
        .keeper = PreferenceKeeper::kDaemon},
       {.domain = kCaptures,
        .key = "accepted",
@@ -75,9 +101,18 @@ std::vector<Preference> allPreferences() {
        .fallback = {},
        .meaning = "How many captures which day has seen",
        .keeper = PreferenceKeeper::kDaemon},
-      {kTonewerk, "device_name", kText, {}, "The device's name in reports"},
-      {kTonewerk, "disable_reporting", kBoolean, false, "Read, and changes nothing"},
-      {kHomedeck, "spatial-audio-accessory-feature", kAny, {}, "Told to every session"},
+      {kTonewerk, "device_name", kText, {}, "The device's name in reports", kWhenTold},
+      {kTonewerk, "disable_reporting", kBoolean, false, "Read, and changes nothing", kNever},
+      {kHomedeck, "spatial-audio-accessory-feature", kAny, {}, "Told to every session", kWhenTold},
+  };
+}
+
+std::vector<Preference> allDeviceFacts() {
+  return {
+      {kDeviceFacts, "InternalBuild", kBoolean, false, "An internal build, which has more diagnostics",
+       kNextStart},
+      {kDeviceFacts, "HapticLeakCapture", kBoolean, false,
+       "Captures of leaking haptics; internal builds only", kReload},
   };
 }
 
@@ -141,6 +176,10 @@ std::string textInQuotes(const Value& value) {
   return value.asString() == nullptr ? value.text() : '"' + value.text() + '"';
 }
 
+const std::vector<Preference>& schemaWith(std::string_view domain) {
+  return domain == kDeviceFacts ? deviceFactSchema() : preferenceSchema();
+}
+
 }  // namespace
 
 const std::vector<Preference>& preferenceSchema() {
@@ -148,12 +187,39 @@ const std::vector<Preference>& preferenceSchema() {
   return schema;
 }
 
+const std::vector<Preference>& deviceFactSchema() {
+  static const std::vector<Preference> schema = allDeviceFacts();
+  return schema;
+}
+
 const Preference* findPreference(std::string_view domain, std::string_view key) {
-  const std::vector<Preference>& schema = preferenceSchema();
+  const std::vector<Preference>& schema = schemaWith(domain);
   const auto found = std::find_if(schema.begin(), schema.end(), [&](const Preference& preference) {
     return preference.domain == domain && preference.key == key;
   });
   return found == schema.end() ? nullptr : &*found;
+}
+
+std::vector<std::string> knownKeys(std::string_view domain) {
+  std::vector<std::string> keys;
+  for (const Preference& preference : schemaWith(domain)) {
+    if (preference.domain == domain) keys.emplace_back(preference.key);
+  }
+  return keys;
+}
+
+std::vector<std::string> unknownKeys(std::string_view domain, const ValueMap& set) {
+  const std::vector<std::string> keys = knownKeys(domain);
+  std::vector<std::string> lines;
+  if (keys.empty()) return lines;
+  for (const ValueMap::Entry& entry : set) {
+    const std::string key = entry.key.string();
+    if (std::find(keys.begin(), keys.end(), key) != keys.end()) continue;
+    const std::optional<std::string> meant = closestTo(key, keys);
+    lines.push_back("the daemon does not read " + key + " of " + std::string(domain) +
+                    (meant ? "; did you mean '" + *meant + "'?" : ""));
+  }
+  return lines;
 }
 
 std::string typeText(const Preference& preference) {
@@ -187,6 +253,24 @@ std::optional<std::string> problemWith(const Preference& preference, const Value
   const std::string wanted =
       preference.type == kBoolean ? "true or false" : (beginsWithVowel ? "an " : "a ") + type;
   return std::string(preference.key) + " must be " + wanted + ", not " + textInQuotes(value);
+}
+
+std::string_view effectText(PreferenceEffect effect) {
+  switch (effect) {
+    case kAtOnce:
+      return "at once";
+    case kWhenTold:
+      return "when its notification is posted";
+    case kReload:
+      return "after a reload";
+    case kNextSession:
+      return "next session";
+    case kNextStart:
+      return "next start";
+    case kNever:
+      return "never";
+  }
+  return "";
 }
 
 }  // namespace tonewerk

@@ -42,6 +42,37 @@ TEST(PreferenceSchemaTest, AMeaningIsOneShortLine) {
   }
 }
 
+TEST(PreferenceSchemaTest, AFactIsABooleanAndNoPreference) {
+  for (const Preference& fact : deviceFactSchema()) {
+    EXPECT_EQ(fact.domain, kDeviceFacts);
+    EXPECT_EQ(findPreference(kDeviceFacts, fact.key), &fact);
+    EXPECT_NE(problemWith(fact, "yes"), std::nullopt);
+    for (const Preference& preference : preferenceSchema()) EXPECT_NE(preference.key, fact.key);
+  }
+  EXPECT_THAT(knownKeys(kDeviceFacts), testing::ElementsAre("InternalBuild", "HapticLeakCapture"));
+}
+
+TEST(PreferenceSchemaTest, NamesTheKeyThatAnUnknownOneIsCloseTo) {
+  const ValueMap set{{"max_dais", 5}, {"max_days", 7}, {"colour", "red"}};
+  EXPECT_THAT(unknownKeys("com.orvane.tonewerk.store", set),
+              testing::UnorderedElementsAre(
+                  "the daemon does not read max_dais of com.orvane.tonewerk.store; did you mean 'max_days'?",
+                  "the daemon does not read colour of com.orvane.tonewerk.store"));
+  EXPECT_THAT(unknownKeys("org.example", set), testing::IsEmpty()) << "others may keep theirs there";
+}
+
+// "5, in MiB" must not be said of a text.
+TEST(PreferenceSchemaTest, OnlyNumbersHaveUnits) {
+  for (const Preference& preference : preferenceSchema()) {
+    const bool isNumber =
+        preference.type == PreferenceType::kNumber || preference.type == PreferenceType::kInteger;
+    EXPECT_TRUE(preference.unit.empty() || isNumber) << preference.key;
+    EXPECT_TRUE(!preference.key.ends_with("_megabytes") || preference.unit == "MiB") << preference.key;
+    EXPECT_TRUE(!preference.key.ends_with("_days") || preference.unit == "days") << preference.key;
+    EXPECT_THAT(effectText(preference.effect), testing::Not(testing::IsEmpty())) << preference.key;
+  }
+}
+
 TEST(PreferenceSchemaTest, ChecksBothEndsOfARange) {
   const Preference& cycle = *findPreference("com.orvane.tonewerk.twreporting", "io_cycle");
   EXPECT_EQ(problemWith(cycle, 0), std::nullopt);

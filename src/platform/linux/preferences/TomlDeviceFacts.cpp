@@ -3,10 +3,13 @@
 
 #include <utility>
 
+#include "platform/PreferenceSchema.h"
+
 namespace tonewerk {
 
-TomlDeviceFacts::TomlDeviceFacts(std::string path, const LogCategory& log) : file_(std::move(path), log) {
-  file_.refresh();
+TomlDeviceFacts::TomlDeviceFacts(std::string path, const LogCategory& log)
+    : log_(log), file_(std::move(path), log) {
+  readAgain();
 }
 
 std::optional<bool> TomlDeviceFacts::boolean(std::string_view property) const {
@@ -19,6 +22,12 @@ std::optional<bool> TomlDeviceFacts::boolean(std::string_view property) const {
 void TomlDeviceFacts::readAgain() {
   const MutexLock lock(mutex_);
   file_.refresh();
+  for (const std::string& line : unknownKeys(kDeviceFacts, file_.values())) errorLog(log_, "%@", line);
+  for (const Preference& fact : deviceFactSchema()) {
+    const Value* value = file_.values().find(fact.key);
+    const std::optional<std::string> problem = value == nullptr ? std::nullopt : problemWith(fact, *value);
+    if (problem) errorLog(log_, "%@: %@", kDeviceFacts, *problem);
+  }
 }
 
 }  // namespace tonewerk

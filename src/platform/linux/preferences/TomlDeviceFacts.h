@@ -11,7 +11,8 @@
 namespace tonewerk {
 
 // Reads device facts from a TOML file: in the constructor, and again in readAgain(). A missing file states no
-// facts. A file that cannot be parsed is logged and states no facts either. Any thread.
+// facts. A file that cannot be parsed is logged and states no facts either. Facts that the daemon does not
+// know, and those that are not booleans, are logged. Any thread.
 class TomlDeviceFacts final : public DeviceFacts {
  public:
   // `log` must outlive this object.
@@ -22,6 +23,7 @@ class TomlDeviceFacts final : public DeviceFacts {
   void readAgain();
 
  private:
+  const LogCategory& log_;
   mutable Mutex mutex_;
   TomlFile file_ GUARDED_BY(mutex_);
 };

@@ -7,7 +7,9 @@
 #include <filesystem>
 #include <functional>
 #include <sys/file.h>
+#include <utility>
 
+#include "platform/PreferenceSchema.h"
 #include "platform/linux/descriptors/FileDescriptor.h"
 #include "platform/linux/files/DurableFile.h"
 #include "platform/linux/files/LinuxFileSystem.h"
@@ -119,7 +121,20 @@ TomlPreferenceStore::Contents TomlPreferenceStore::contentsOf(std::string_view d
 
 void TomlPreferenceStore::checkFile(std::string_view fileName) const {
   if (!fileName.ends_with(kEnding)) return;
-  contentsOf(fileName.substr(0, fileName.size() - kEnding.size()));
+  const std::string_view domain = fileName.substr(0, fileName.size() - kEnding.size());
+  const Contents contents = contentsOf(domain);
+  ValueMap set = contents.configured;
+  set.merge(contents.written);
+  logUnknownKeys(domain, unknownKeys(domain, set));
+}
+
+void TomlPreferenceStore::logUnknownKeys(std::string_view domain,
+                                         const std::vector<std::string>& lines) const {
+  {
+    const MutexLock lock(mutex_);
+    if (std::exchange(loggedUnknown_[std::string(domain)], lines) == lines) return;
+  }
+  for (const std::string& line : lines) errorLog(log_, "%@", line);
 }
 
 void TomlPreferenceStore::checkAllFiles() const {

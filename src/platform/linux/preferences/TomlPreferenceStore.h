@@ -46,7 +46,8 @@ class TomlPreferenceStore final : public PreferenceStore {
                                        std::string* problem = nullptr) override;
 
   // Read one file, or all files, again if they have changed, so that their problems are logged now and not at
-  // the next use. A name that is not that of a preference file is ignored.
+  // the next use. Keys that the daemon does not know in a domain of its own are logged, too, until they
+  // change. A name that is not that of a preference file is ignored.
   void checkFile(std::string_view fileName) const;
   void checkAllFiles() const;
 
@@ -67,6 +68,7 @@ class TomlPreferenceStore final : public PreferenceStore {
   Contents contentsOf(std::string_view domain) const;
   // The domain, which must be one, after its files were read again where they have changed.
   Domain& refreshed(std::string_view domain) const REQUIRES(mutex_);
+  void logUnknownKeys(std::string_view domain, const std::vector<std::string>& lines) const;
   // Holds the writers' lock, calls `change` with the domain's contents and then stores `written`.
   template <typename Change>
   [[nodiscard]] std::error_code update(std::string_view domain, std::string* problem, Change change);
@@ -78,6 +80,7 @@ class TomlPreferenceStore final : public PreferenceStore {
   const LogCategory& log_;
   mutable Mutex mutex_;  // not held while a writer writes to the disk
   mutable std::map<std::string, Domain, std::less<>> domains_ GUARDED_BY(mutex_);
+  mutable std::map<std::string, std::vector<std::string>> loggedUnknown_ GUARDED_BY(mutex_);  // by domain
 };
 
 }  // namespace tonewerk

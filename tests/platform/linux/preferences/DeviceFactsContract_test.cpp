@@ -61,6 +61,14 @@ TEST_F(TomlDeviceFactsTest, AFileThatDoesNotParseStatesNothingAndIsLogged) {
   EXPECT_THAT(log_.textsOf("twrs"), ElementsAre(HasSubstr("device-facts.toml:2:")));
 }
 
+TEST_F(TomlDeviceFactsTest, FactsThatTheDaemonCannotUseAreLogged) {
+  factsOf("InternalBild = true\nHapticLeakCapture = 1\n");
+  EXPECT_THAT(
+      log_.textsOf("twrs", LogLevel::kError),
+      ElementsAre("the daemon does not read InternalBild of device-facts; did you mean 'InternalBuild'?",
+                  "device-facts: HapticLeakCapture must be true or false, not 1"));
+}
+
 TEST_F(TomlDeviceFactsTest, FactsChangeWhenTheyAreReadAgainAndNotBefore) {
   const auto facts = factsOf("InternalBuild = true\n");
   factsOf("InternalBuild = false\n");

@@ -65,6 +65,20 @@ TEST_F(TomlPreferenceStoreTest, AFileThatIsNotUtf8IsLoggedAndNotOverwritten) {
   EXPECT_EQ(contentsOf(written()), contents);
 }
 
+TEST_F(TomlPreferenceStoreTest, LogsTheKeysThatTheDaemonDoesNotReadUntilTheyChange) {
+  const std::string domain = "com.orvane.tonewerk.store";
+  write(directory_.path("configuration/" + domain + ".toml"), "max_dais = 5\nmax_days = 5\n");
+  write(directory_.path("state/org.example.toml"), "anything = 1\n");
+  store_.checkAllFiles();
+  store_.checkAllFiles();
+  EXPECT_THAT(log_.textsAt(LogLevel::kError),
+              testing::ElementsAre("the daemon does not read max_dais of com.orvane.tonewerk.store; "
+                                   "did you mean 'max_days'?"));
+  EXPECT_FALSE(store_.write(domain, "max_weeks", 1));
+  store_.checkFile(domain + ".toml");
+  EXPECT_THAT(log_.textsAt(LogLevel::kError), SizeIs(3)) << "both keys now";
+}
+
 TEST_F(TomlPreferenceStoreTest, ReadsWhatAnotherProcessWrote) {
   EXPECT_FALSE(store_.write(kDomain, "a", 1));
   EXPECT_EQ(store_.read(kDomain, "a"), Value(1));
