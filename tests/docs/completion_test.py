@@ -118,7 +118,11 @@ class CompletionTest(unittest.TestCase):
         domains = re.findall(r'\bk(?:PreferenceDomain|Domain|ReportingSuite) = "([^"]+)"', source)
         domains += re.findall(r'{kFeatureDefaultsDomain, "([^"]+)"}', source)
         self.assertGreater(len(domains), 5)
-        self.assertEqual(set(self.offers("twctl", "defaults", "read", "")), set(domains))
+        self.assertEqual(set(self.offers("twctl", "defaults", "write", "")), set(domains))
+        self.assertEqual(set(self.offers("twctl", "defaults", "read", "")), {*domains, "device-facts"})
+        self.assertEqual(self.offers("twctl", "defaults", "write", "com.orvane.linkreport", "event_name_attribute", ""),
+                         ["true", "false"])
+        self.assertEqual(self.offers("twctl", "defaults", "write", "com.orvane.linkreport", "device_id", ""), [])
 
     def test_offers_the_preference_keys_of_the_manual_page(self):
         page = (SOURCE / "docs/man/tonewerk-reporting-preferences.5").read_text()

@@ -21,13 +21,26 @@ def schema():
 
 
 def explained():
-    """Returns type and default of each key in the manual page, as texts."""
+    """Returns of each key in the manual page, as texts, what it may be, its default, and since when a change counts."""
     page = (SOURCE / "docs/man/tonewerk-reporting-preferences.5").read_text().replace(r"\(dq", '"')
     found = {}
-    for domain, text in re.findall(r"^\.Ss (com\.\S+)\n(.*?)(?=^\.S[sh] )", page, re.DOTALL | re.MULTILINE):
+    page = page.replace(".Sh DEVICE FACTS", ".Ss device-facts")
+    for domain, text in re.findall(r"^\.Ss (com\.\S+|device-facts)\n(.*?)(?=^\.S[sh] )", page, re.DOTALL | re.MULTILINE):
         for key, words in re.findall(r"^\.It Li (\S+) Pq (.*)", text, re.MULTILINE):
-            found[domain, key] = words.split(", default ", 1)
+            kind, rest = words.split(", default ", 1)
+            found[domain, key] = [kind, *rest.rsplit("; ", 1)]
     return found
+
+
+def as_toml(value):
+    """Returns a value as a person would write it in a file, and "none" without one."""
+    if value is None:
+        return "none"
+    if isinstance(value, list):
+        return "[" + ", ".join(map(as_toml, value)) + "]"
+    if isinstance(value, dict):
+        return "{" + ", ".join(f"{key} = {as_toml(entry)}" for key, entry in value.items()) + "}"
+    return json.dumps(value)
 
 
 def without_comment_marks(path):
@@ -46,10 +59,28 @@ class PreferencesTest(unittest.TestCase):
         self.assertEqual({(row["domain"], row["key"]) for row in rows}, set(page))
         for row in rows:
             with self.subTest(key=row["key"]):
-                kind, default = page[row["domain"], row["key"]]
-                self.assertEqual(kind, row["type"])
+                kind, default, counts = page[row["domain"], row["key"]]
+                self.assertEqual(kind, row["type"] + (f", in {row['unit']}" if row["unit"] else ""))
+                self.assertEqual(counts, row["counts"])
                 told = None if default == "none" else tomllib.loads(f"value = {default}")["value"]
                 self.assertEqual(told, row["default"])
+
+    def test_the_table_of_the_configuration_page_says_what_the_schema_says(self):
+        page = (SOURCE / "docs/configuration.md").read_text()
+        table = re.search(r"^## All preferences and facts\n.*?(?=^## )", page, re.DOTALL | re.MULTILINE).group(0)
+        wanted = []
+        for row in schema():
+            default = as_toml(row["default"])
+            cells = [
+                f"`{row['domain']}`",
+                f"`{row['key']}`",
+                row["type"] + (f", {row['unit']}" if row["unit"] else ""),
+                default if default == "none" else f"`{default}`",
+                row["counts"],
+                row["meaning"],
+            ]
+            wanted.append("| " + " | ".join(cells) + " |")
+        self.assertEqual([line for line in table.splitlines() if line.startswith("| `")], wanted)
 
     def test_shipped_files_hold_what_their_keys_may_be(self):
         self.assertGreater(len(SHIPPED), 3)
@@ -90,7 +121,8 @@ class PreferencesTest(unittest.TestCase):
         for row in schema():
             with self.subTest(key=row["key"]):
                 self.assertIn(f'"{row["key"]}"', text)
-                self.assertIn(f'"{row["domain"]}"', text)
+                domain = "/device-facts.toml" if row["domain"] == "device-facts" else f'"{row["domain"]}"'
+                self.assertIn(domain, text)
 
 
 if __name__ == "__main__":

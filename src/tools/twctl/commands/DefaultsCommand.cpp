@@ -11,6 +11,7 @@
 #include "platform/Log.h"
 #include "platform/PreferenceSchema.h"
 #include "platform/linux/notifications/NotificationFiles.h"
+#include "platform/linux/preferences/TomlFile.h"
 #include "platform/linux/preferences/TomlPreferenceStore.h"
 #include "platform/linux/preferences/TomlText.h"
 #include "protocol/FeatureTable.h"
@@ -35,15 +36,28 @@ class Preferences {
       : log_(tool),
         category_(log_, "com.orvane.tonewerk", "twctl"),
         store_(tool.directories().configuration + "/preferences", tool.directories().state + "/preferences",
-               category_) {}
+               category_),
+        facts_(tool.directories().configuration + "/device-facts.toml", category_) {}
 
   TomlPreferenceStore& store() { return store_; }
+
+  // The device facts are all configured.
+  TomlPreferenceStore::Layers layersOf(const std::string& domain) {
+    if (domain != kDeviceFacts) return store_.readLayers(domain);
+    facts_.refresh();
+    return {facts_.values(), {}};
+  }
 
  private:
   ToolLog log_;
   LogCategory category_;
   TomlPreferenceStore store_;
+  TomlFile facts_;
 };
+
+const std::vector<Preference>& schemaWith(const std::string& domain) {
+  return domain == kDeviceFacts ? deviceFactSchema() : preferenceSchema();
+}
 
 // A key that is set or has a default.
 struct Entry {
@@ -64,7 +78,7 @@ std::vector<Entry> entriesOf(const std::string& domain, const TomlPreferenceStor
       entries.push_back({key, known->fallback, "default"});
     }
   };
-  for (const Preference& preference : preferenceSchema()) {
+  for (const Preference& preference : schemaWith(domain)) {
     if (preference.domain == domain) add(std::string(preference.key), &preference);
   }
   ValueMap set = layers.configured;
@@ -86,7 +100,7 @@ Table::Cell cellOf(const std::optional<Value>& value) {
 
 void read(Tool& tool, const DefaultsOptions& options) {
   Preferences preferences(tool);
-  std::vector<Entry> entries = entriesOf(options.domain, preferences.store().readLayers(options.domain));
+  std::vector<Entry> entries = entriesOf(options.domain, preferences.layersOf(options.domain));
   if (options.key) std::erase_if(entries, [&](const Entry& entry) { return entry.key != *options.key; });
   if (entries.empty()) {
     const std::string what = options.key ? *options.key + " of " + options.domain : options.domain;
@@ -101,6 +115,8 @@ void read(Tool& tool, const DefaultsOptions& options) {
   }
   for (const Entry& entry : entries) {
     if (std::string_view(entry.from) == "default") continue;
+    for (const std::string& problem : unknownKeys(options.domain, {{entry.key, *entry.value}}))
+      tool.warn(problem);
     for (const std::string& problem : preferenceProblems(options.domain, entry.key, *entry.value))
       tool.warn(problem);
   }
@@ -134,28 +150,46 @@ Value valueToWrite(const DefaultsOptions& options) {
   return !value || (isText && value->asString() == nullptr) ? Value(options.value) : *value;
 }
 
+// Why nothing may be written or deleted; empty when it may.
+std::string problemWithTarget(const Tool& tool, const DefaultsOptions& options, bool isNew) {
+  if (options.domain == kDeviceFacts) {
+    return "device facts are not preferences; edit " + tool.directories().configuration +
+           "/device-facts.toml and reload the daemon";
+  }
+  const bool isMistyped =
+      isNew && !knownKeys(options.domain).empty() && findPreference(options.domain, *options.key) == nullptr;
+  return isMistyped ? "the daemon does not read " + *options.key + " of " + options.domain +
+                          preferenceHint(options.domain, options.key)
+                    : "";
+}
+
 void write(Tool& tool, const DefaultsOptions& options) {
+  if (const std::string problem = problemWithTarget(tool, options, true); !problem.empty()) {
+    tool.status = tool.fail(kRefused, problem);
+    return;
+  }
   const Value value = valueToWrite(options);
   const Preference* known = findPreference(options.domain, *options.key);
-  if (known != nullptr) {
-    const std::vector<std::string> problems = preferenceProblems(options.domain, *options.key, value);
-    for (const std::string& problem : problems) tool.status = tool.fail(kRefused, problem);
-    if (!problems.empty()) return;
-  }
+  const std::vector<std::string> problems = preferenceProblems(options.domain, *options.key, value);
+  for (const std::string& problem : problems) tool.status = tool.fail(kRefused, problem);
+  if (!problems.empty()) return;
   Preferences preferences(tool);
   std::string problem;
   const std::error_code error = preferences.store().write(options.domain, *options.key, value, &problem);
   finish(tool, options, error, problem);
   if (error) return;
   if (known == nullptr) {
-    tool.warn("the daemon does not read " + *options.key + " of " + options.domain +
-              preferenceHint(options.domain, options.key));
+    tool.warn("the daemon does not read " + options.domain + preferenceHint(options.domain, options.key));
   } else if (known->keeper == PreferenceKeeper::kDaemon) {
     tool.warn("the daemon keeps " + *options.key + " itself, and will write over it");
   }
 }
 
 void remove(Tool& tool, const DefaultsOptions& options) {
+  if (const std::string problem = problemWithTarget(tool, options, false); !problem.empty()) {
+    tool.status = tool.fail(kRefused, problem);
+    return;
+  }
   Preferences preferences(tool);
   std::string problem;
   const std::error_code error = preferences.store().remove(options.domain, *options.key, &problem);
@@ -178,27 +212,33 @@ void describeToPeople(std::ostream& out, const std::vector<const Preference*>& p
   for (const Preference* preference : preferences) {
     if (preference->domain != domain) out << (domain.empty() ? "" : "\n") << preference->domain << '\n';
     domain = preference->domain;
-    out << "  " << preference->key << "  " << typeText(*preference) << '\n';
-    out << "    " << preference->meaning << '\n';
-    out << "    default " << defaultText(*preference) << '\n';
+    out << "  " << preference->key << "  " << typeText(*preference);
+    if (!preference->unit.empty()) out << ", in " << preference->unit;
+    out << "\n    " << preference->meaning << '\n';
+    out << "    default " << defaultText(*preference)
+        << "; a change counts: " << effectText(preference->effect) << '\n';
     if (preference->keeper == PreferenceKeeper::kDaemon) out << "    kept by the daemon itself\n";
   }
 }
 
 void describeToPrograms(std::ostream& out, const std::vector<const Preference*>& preferences) {
-  Table table(out, true, {"domain", "key", "type", "default", "keeper", "meaning"});
+  Table table(out, true, {"domain", "key", "type", "default", "keeper", "meaning", "unit", "counts"});
   for (const Preference* preference : preferences) {
     table.add({Value(preference->domain), Value(preference->key), Value(typeText(*preference)),
-               cellOf(preference->fallback), Value(textOf(preference->keeper)), Value(preference->meaning)});
+               cellOf(preference->fallback), Value(textOf(preference->keeper)), Value(preference->meaning),
+               cellOf(preference->unit.empty() ? std::nullopt : std::optional<Value>(preference->unit)),
+               Value(effectText(preference->effect))});
   }
 }
 
 void describe(Tool& tool, const DefaultsOptions& options) {
   std::vector<const Preference*> described;
-  for (const Preference& preference : preferenceSchema()) {
-    const bool isWanted = (options.domain.empty() || options.domain == preference.domain) &&
-                          (!options.key || *options.key == preference.key);
-    if (isWanted) described.push_back(&preference);
+  for (const std::vector<Preference>* schema : {&preferenceSchema(), &deviceFactSchema()}) {
+    for (const Preference& preference : *schema) {
+      const bool isWanted = (options.domain.empty() || options.domain == preference.domain) &&
+                            (!options.key || *options.key == preference.key);
+      if (isWanted) described.push_back(&preference);
+    }
   }
   if (described.empty()) {
     const std::string what = options.key ? *options.key + " of " + options.domain : options.domain;
@@ -251,6 +291,11 @@ void addDefaultsCommand(CLI::App& app, Tool& tool) {
 
   CLI::App& describing =
       addCommand(command, tool, "describe", "What the daemon reads: types, defaults, meanings");
+  describing.footer(
+      "A change counts at once, when its notification is posted (which write and delete do), after a "
+      "reload,\n"
+      "in sessions that start afterwards, or at the daemon's next start. The domain device-facts stands for\n"
+      "the device facts, which only read and describe take.");
   describing.add_option("KEY", addAction(describing, tool, describe)->key, "Only this key");
 }
 

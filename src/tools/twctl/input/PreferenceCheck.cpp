@@ -39,16 +39,20 @@ std::vector<std::string> preferenceProblems(std::string_view domain, std::string
   return problems;
 }
 
-std::string preferenceHint(const std::string& domain, const std::optional<std::string>& key) {
+std::vector<std::string> preferenceDomains() {
   std::vector<std::string> domains;
-  std::vector<std::string> keys;
   for (const Preference& preference : preferenceSchema()) {
-    domains.emplace_back(preference.domain);
-    if (preference.domain == domain) keys.emplace_back(preference.key);
+    if (domains.empty() || domains.back() != preference.domain) domains.emplace_back(preference.domain);
   }
-  const bool isKnownDomain = !keys.empty();
-  if (isKnownDomain && !key) return {};
-  const std::optional<std::string> meant = isKnownDomain ? closestTo(*key, keys) : closestTo(domain, domains);
+  return domains;
+}
+
+std::string preferenceHint(const std::string& domain, const std::optional<std::string>& key) {
+  const std::vector<std::string> keys = knownKeys(domain);
+  if (!keys.empty()) return key ? "; " + hintFor(*key, keys) : "";
+  std::vector<std::string> domains = preferenceDomains();
+  domains.emplace_back(kDeviceFacts);
+  const std::optional<std::string> meant = closestTo(domain, domains);
   return meant ? "; " + didYouMean(*meant) : "";
 }
 

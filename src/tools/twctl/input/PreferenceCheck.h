@@ -15,8 +15,11 @@ namespace tonewerk {
 [[nodiscard]] std::vector<std::string> preferenceProblems(std::string_view domain, std::string_view key,
                                                           const Value& value);
 
-// "; did you mean 'max_days'?", for a domain or key that the daemon does not know; empty when nothing is
-// close.
+// The domains that the daemon knows, without the facts.
+std::vector<std::string> preferenceDomains();
+
+// "; did you mean 'max_days'?", for a domain or key that the daemon does not know. When no key is close, it
+// lists the keys of a known domain; empty when no domain is close.
 std::string preferenceHint(const std::string& domain, const std::optional<std::string>& key);
 
 }  // namespace tonewerk

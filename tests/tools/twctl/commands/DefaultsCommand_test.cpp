@@ -103,6 +103,46 @@ TEST_F(DefaultsCommandTest, RefusesWhatTheKeyCannotBe) {
                 "memory_tools must be an array of two texts, not [\"free\"]");
 }
 
+// In a domain of the daemon, such a key can only be a mistake.
+TEST_F(DefaultsCommandTest, RefusesAKeyThatTheDaemonDoesNotReadInADomainOfItsOwn) {
+  const std::string store = "com.orvane.tonewerk.store";
+  expectRefused(store, "max_dais", "5",
+                "the daemon does not read max_dais of com.orvane.tonewerk.store; did you mean 'max_days'?");
+  expectRefused("com.orvane.tonewerk", "volume", "5",
+                "the daemon does not read volume of com.orvane.tonewerk; there are device_name and "
+                "disable_reporting");
+  configure(store, "");
+  std::filesystem::create_directories(directory_.path("state/preferences"));
+  write("state/preferences/" + store + ".toml", "max_dais = 5\n");
+  EXPECT_EQ(run({"defaults", "read", store}), kDone);
+  EXPECT_EQ(errors(),
+            "twctl: warning: the daemon does not read max_dais of com.orvane.tonewerk.store; did you mean "
+            "'max_days'?\n");
+  EXPECT_EQ(run({"defaults", "delete", store, "max_dais"}), kDone) << "what is wrong can be taken back";
+}
+
+TEST_F(DefaultsCommandTest, ShowsDeviceFactsAndLeavesThemToTheirFile) {
+  std::filesystem::create_directories(directory_.path("configuration"));
+  write("configuration/device-facts.toml", "InternalBuild = 1\nHapticLeakCaptures = true\n");
+  EXPECT_EQ(run({"defaults", "read", "device-facts"}), kDone);
+  EXPECT_EQ(output(),
+            "key                 from           value\n"
+            "InternalBuild       configuration  1\n"
+            "HapticLeakCapture   default        false\n"
+            "HapticLeakCaptures  configuration  true\n");
+  EXPECT_EQ(errors(),
+            "twctl: warning: InternalBuild must be true or false, not 1\n"
+            "twctl: warning: the daemon does not read HapticLeakCaptures of device-facts; did you mean "
+            "'HapticLeakCapture'?\n");
+  EXPECT_EQ(run({"defaults", "describe", "device-facts", "InternalBuild"}), kDone);
+  EXPECT_THAT(output(), HasSubstr("default false; a change counts: next start\n"));
+  const std::string problem = "device facts are not preferences; edit " + directory_.path("configuration") +
+                              "/device-facts.toml and reload the daemon";
+  expectRefused("device-facts", "InternalBuild", "true", problem);
+  EXPECT_EQ(run({"defaults", "delete", "device-facts", "InternalBuild"}), kRefused);
+  EXPECT_EQ(errors(), "twctl: " + problem + "\n");
+}
+
 // The daemon would ignore these entries, and only log it.
 TEST_F(DefaultsCommandTest, RefusesEntriesThatTheDaemonWouldLeaveOut) {
   EXPECT_EQ(
@@ -129,12 +169,12 @@ TEST_F(DefaultsCommandTest, WhatIsTypedForATextIsThatText) {
 }
 
 TEST_F(DefaultsCommandTest, WarnsOfWhatTheDaemonDoesNotReadOrKeepsItself) {
-  EXPECT_EQ(run({"defaults", "write", "com.orvane.tonewerk.store", "max_dais", "5"}), kDone);
-  EXPECT_EQ(errors(),
-            "twctl: warning: the daemon does not read max_dais of com.orvane.tonewerk.store; did you mean "
-            "'max_days'?\n");
   EXPECT_EQ(run({"defaults", "write", "org.example", "anything", "5"}), kDone);
-  EXPECT_EQ(errors(), "twctl: warning: the daemon does not read anything of org.example\n");
+  EXPECT_EQ(errors(), "twctl: warning: the daemon does not read org.example\n");
+  EXPECT_EQ(run({"defaults", "write", "com.orvane.metrikon", "anything", "5"}), kDone);
+  EXPECT_EQ(errors(),
+            "twctl: warning: the daemon does not read com.orvane.metrikon; did you mean "
+            "'com.orvane.metricon'?\n");
   EXPECT_EQ(run({"defaults", "write", "com.orvane.tonewerk.twreporting", "VidroInvalidXyIDRlastRun", "5"}),
             kDone);
   EXPECT_EQ(errors(),
@@ -152,32 +192,35 @@ TEST_F(DefaultsCommandTest, DescribesThePreferencesThereAre) {
   EXPECT_EQ(run({"defaults", "describe", "com.orvane.tonewerk.store"}), kDone);
   EXPECT_EQ(output(),
             "com.orvane.tonewerk.store\n"
-            "  max_megabytes  number from 1\n"
+            "  max_megabytes  number from 1, in MiB\n"
             "    MiB that the store takes, its log included\n"
-            "    default 256\n"
-            "  max_days  number from 1\n"
+            "    default 256; a change counts: at once\n"
+            "  max_days  number from 1, in days\n"
             "    Age of the oldest report in days\n"
-            "    default 30\n"
-            "  journal_megabytes  number from 0\n"
+            "    default 30; a change counts: at once\n"
+            "  journal_megabytes  number from 0, in MiB\n"
             "    MiB of requests kept to outlive a crash\n"
-            "    default 64\n"
-            "  journal_sync_seconds  number from 0 to 3600\n"
+            "    default 64; a change counts: at once\n"
+            "  journal_sync_seconds  number from 0 to 3600, in seconds\n"
             "    Seconds until a request is on the disk\n"
-            "    default 5\n"
-            "  journal_days  number from 0\n"
+            "    default 5; a change counts: at once\n"
+            "  journal_days  number from 0, in days\n"
             "    Days that requests are kept for replay\n"
-            "    default 0\n");
+            "    default 0; a change counts: at once\n");
   EXPECT_EQ(run({"defaults", "describe", "com.orvane.linkreport", "event_name_attribute"}), kDone);
-  EXPECT_THAT(output(), HasSubstr("    default false\n"));
+  EXPECT_THAT(output(), HasSubstr("    default false; a change counts: next session\n"));
   EXPECT_EQ(run({"defaults", "describe", "com.orvane.tonewerk.captures"}), kDone);
-  EXPECT_THAT(output(), HasSubstr("    default none\n    kept by the daemon itself\n"));
+  EXPECT_THAT(output(),
+              HasSubstr("    default none; a change counts: at once\n    kept by the daemon itself\n"));
   EXPECT_EQ(run({"defaults", "describe", "com.orvane.tonewerk.store", "max_days", "--json"}), kDone);
-  EXPECT_EQ(output(),
-            R"({"domain":"com.orvane.tonewerk.store","key":"max_days","type":"number from 1","default":30,)"
-            R"("keeper":"people","meaning":"Age of the oldest report in days"})"
-            "\n");
+  EXPECT_EQ(
+      output(),
+      R"({"domain":"com.orvane.tonewerk.store","key":"max_days","type":"number from 1","default":30,)"
+      R"("keeper":"people","meaning":"Age of the oldest report in days","unit":"days","counts":"at once"})"
+      "\n");
   EXPECT_EQ(run({"defaults", "describe"}), kDone);
-  EXPECT_THAT(output(), HasSubstr("\n\ncom.orvane.homedeck\n"));
+  EXPECT_THAT(output(),
+              testing::AllOf(HasSubstr("\n\ncom.orvane.homedeck\n"), HasSubstr("\n\ndevice-facts\n")));
 }
 
 class AnnouncedDefaultsTest : public CommandLineTest {
@@ -207,8 +250,8 @@ TEST_F(AnnouncedDefaultsTest, NotifiesTheDaemonOfWatchedPreferences) {
 }
 
 TEST_F(AnnouncedDefaultsTest, NotifiesOnlyOfChangedPreferencesThatAreWatched) {
-  EXPECT_EQ(run({"defaults", "write", "com.orvane.homedeck", "device_name", "1"}), kDone);
-  EXPECT_EQ(run({"defaults", "write", "com.orvane.metricon", "device_name", "1"}), kDone);
+  EXPECT_EQ(run({"defaults", "write", "com.orvane.homedeck", "device_name", "1"}), kRefused);
+  EXPECT_EQ(run({"defaults", "write", "com.orvane.linkreport", "device_id", "1"}), kDone);
   EXPECT_EQ(run({"defaults", "read", "com.orvane.homedeck"}), kDone);
   EXPECT_EQ(run({"defaults", "delete", "com.orvane.tonewerk", "device_name"}), kRefused);
   EXPECT_THAT(posted(), IsEmpty());
