@@ -11,6 +11,7 @@ class Capsa;
 class Chanmeter;
 class Clock;
 class CommandRunner;
+struct DaemonStatus;
 class DetachedThreads;
 class DeviceFacts;
 class Diagwire;
@@ -68,6 +69,8 @@ struct Platform {
   Journal* journal = nullptr;
   // Where the lives of sessions are entered; null for nowhere.
   SessionBook* sessionBook = nullptr;
+  // What the daemon says of itself; null when it says nothing.
+  const DaemonStatus* status = nullptr;
   // The directory for reports that people read; absolute.
   std::string logsDirectory = {};
   // The directory for files that are soon moved elsewhere; absolute.

@@ -37,5 +37,17 @@ inline const SharedString kWatchKeySinks("sinks");
 inline const SharedString kWatchKeyWaiting("waiting");
 inline const SharedString kWatchKeyDropped("dropped");
 inline const SharedString kWatchKeyHangs("hangs");
+inline const SharedString kWatchKeyDaemon("daemon");
+inline const SharedString kWatchKeyVersion("version");
+inline const SharedString kWatchKeyStartedAt("startedAt");
+inline const SharedString kWatchKeyInternalBuild("internalBuild");
+inline const SharedString kWatchKeyRuntime("runtime");
+inline const SharedString kWatchKeyState("state");
+inline const SharedString kWatchKeyConfiguration("configuration");
+inline const SharedString kWatchKeyEndpoints("endpoints");
+inline const SharedString kWatchKeyProblem("problem");
+inline const SharedString kWatchKeyTroubles("troubles");
+inline const SharedString kWatchKeyText("text");
+inline const SharedString kWatchKeyTimes("times");
 
 }  // namespace tonewerk

@@ -6,6 +6,7 @@
 #include <string>
 #include <utility>
 
+#include "platform/DaemonStatus.h"
 #include "platform/Log.h"
 #include "platform/Platform.h"
 #include "platform/SerialQueue.h"
@@ -13,6 +14,7 @@
 #include "platform/accounts/TurnQueue.h"
 #include "protocol/WatchKeys.h"
 #include "service/AccountListing.h"
+#include "service/DaemonListing.h"
 #include "service/MessageTap.h"
 #include "service/SessionListing.h"
 #include "service/SinkListing.h"
@@ -99,8 +101,16 @@ void WatchRequests::nextMessages(Reply reply, InFlightToken token) {
 void WatchRequests::accounts(const Reply& reply) const {
   TWReportingContext& context = TWReportingContext::current();
   ValueMap listing = accountListing(context.platform().accounts, *account_);
-  // How much waits says what other users do.
-  if (account_->isTrusted()) listing.set(kWatchKeySinks, sinkListing(context.sinks()));
+  const DaemonStatus* status = context.platform().status;
+  if (status != nullptr) listing.set(kWatchKeyDaemon, daemonListing(*status, context.isInternalBuild()));
+  // How much waits, where it goes and what is logged says what other users do.
+  if (account_->isTrusted()) {
+    listing.set(kWatchKeySinks, sinkListing(context.sinks()));
+    if (status != nullptr) {
+      listing.set(kWatchKeyEndpoints, endpointListing(*status));
+      listing.set(kWatchKeyTroubles, troubleListing(*status));
+    }
+  }
   reply(std::nullopt, listing);
 }
 

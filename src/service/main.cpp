@@ -20,6 +20,7 @@
 #include <unistd.h>
 
 #include "monitor/TWReportingSystemMonitor.h"
+#include "platform/DaemonStatus.h"
 #include "platform/Heartbeat.h"
 #include "platform/JournalPreferences.h"
 #include "platform/Log.h"
@@ -159,6 +160,7 @@ class Daemon {
         runtimeDirectory_(directories.runtime),
         log_(log),
         clock_(linux.clock()),
+        daemonStatus_(statusOf(directories)),
         heartbeats_(log),
         attempts_(directories.state + "/journal", log),
         segments_(directories.state + "/journal", linux.preferences(), log),
@@ -302,10 +304,24 @@ class Daemon {
     markSignposts();
   }
 
+  DaemonStatus statusOf(const Directories& directories) {
+    return {.version = TONEWERK_VERSION,
+            .processIdentifier = ::getpid(),
+            .user = ::geteuid(),
+            .startedAt = linux_.clock().now(),
+            .startedAtSteady = std::chrono::steady_clock::now(),
+            .runtimeDirectory = directories.runtime,
+            .stateDirectory = directories.state,
+            .configurationDirectory = directories.configuration,
+            .endpoints = [this] { return linkReport_.endpoints(); },
+            .troubles = [this] { return linux_.troubles(); }};
+  }
+
   Platform platformOf(LinuxPlatform& linux, const Directories& directories) {
     Platform platform =
         linux.platform(clock_, metricon_, energybook_, diagwire_, linkReport_, tracing_, journal_);
     platform.sessionBook = &sessionBook_;
+    platform.status = &daemonStatus_;
     platform.logsDirectory = directories.logs;
     return platform;
   }
@@ -352,6 +368,7 @@ class Daemon {
   std::unique_ptr<Timer> endGuard_;  // made for the end; ends after what may hang
   bool hasSignposts_ = false;
   PlayedClock clock_;
+  const DaemonStatus daemonStatus_;
   Heartbeats heartbeats_;
   RecoveryAttempts attempts_;
   SegmentJournal segments_;

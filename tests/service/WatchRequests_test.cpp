@@ -81,6 +81,25 @@ TEST_F(WatchRequestsTest, IsForTrustedUsers) {
   listSessions(*root);
 }
 
+// The daemon itself.
+
+TEST_F(WatchRequestsTest, SaysWhatTheDaemonIsToEverybodyAndWhatItLoggedToTrustedUsers) {
+  test.status.version = "1.0";
+  test.status.troubles = [] { return std::vector<LoggedTrouble>{{5.0, "twrs", "cannot write", 1, 1000}}; };
+  test.deviceFacts.set("InternalBuild", true);
+  const auto other = messaging.connect(12, kOther);
+  const Value seen = askOnce(*other, "watch.accounts", {});
+  const ValueMap& daemon = *seen.asMap()->find("daemon")->asMap();
+  EXPECT_EQ(daemon.text("version"), "1.0");
+  EXPECT_TRUE(daemon.boolean("internalBuild"));
+  for (const char* hidden : {"sinks", "endpoints", "troubles"})
+    EXPECT_FALSE(seen.asMap()->contains(hidden)) << hidden;
+  const auto root = messaging.connect(13, 0);
+  const Value all = askOnce(*root, "watch.accounts", {});
+  EXPECT_TRUE(all.asMap()->contains("sinks") && all.asMap()->contains("endpoints"));
+  EXPECT_THAT(all.asMap()->find("troubles")->text(), testing::HasSubstr("cannot write"));
+}
+
 // Sessions.
 
 TEST_F(WatchRequestsTest, DescribesEachSession) {

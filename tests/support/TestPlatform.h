@@ -3,6 +3,7 @@
 
 #include <cstdint>
 
+#include "platform/DaemonStatus.h"
 #include "platform/Platform.h"
 #include "platform/accounts/Accounts.h"
 #include "support/manual/ManualClock.h"
@@ -98,6 +99,7 @@ struct TestPlatform {
             .threads = threads,
             .journal = journal,
             .sessionBook = &sessionBook,
+            .status = &status,
             .logsDirectory = "/logs",
             .temporaryDirectory = "/tmp"};
   }
@@ -131,6 +133,7 @@ struct TestPlatform {
   MemoryDetachedThreads threads;
   MemorySessionBook sessionBook;
   Journal* journal = nullptr;
+  DaemonStatus status;  // empty
 };
 
 }  // namespace tonewerk

@@ -26,6 +26,7 @@
 #include "platform/linux/log/RecentLines.h"
 #include "platform/linux/log/RememberingLog.h"
 #include "platform/linux/log/StandardLog.h"
+#include "platform/linux/log/TroubleLog.h"
 #include "platform/linux/messaging/AllocatorReclaimer.h"
 #include "platform/linux/notifications/InotifyNotificationService.h"
 #include "platform/linux/preferences/PreferenceWatcher.h"
@@ -68,9 +69,11 @@ std::unique_ptr<QueuedLog> makeQueuedLog(const Clock& clock, QueuedLog*& made) {
 // A line takes the way from below to above: lines that are held back cost nothing more, and whatever is
 // written or kept is escaped.
 std::unique_ptr<Log> makeLog(std::unique_ptr<QueuedLog> queuedLog, const Clock& clock,
-                             const std::shared_ptr<RecentLines>& recentLines) {
+                             const std::shared_ptr<RecentLines>& recentLines,
+                             const std::shared_ptr<RecentTroubles>& troubles) {
   std::unique_ptr<Log> log = std::make_unique<RememberingLog>(std::move(queuedLog), recentLines, clock);
   log = std::make_unique<CondensingLog>(std::move(log), clock);
+  log = std::make_unique<TroubleLog>(std::move(log), troubles, clock);
   log = std::make_unique<EscapingLog>(std::move(log));
   return std::make_unique<FairLog>(std::move(log), clock);
 }
@@ -91,8 +94,9 @@ struct LinuxPlatform::Adapters {
   SystemClock clock;
   Accounts accounts{::geteuid(), clock};
   const std::shared_ptr<RecentLines> logLines = std::make_shared<RecentLines>();
+  const std::shared_ptr<RecentTroubles> troubles = std::make_shared<RecentTroubles>();
   QueuedLog* queuedLog = nullptr;  // a part of the log
-  std::unique_ptr<Log> log = makeLog(makeQueuedLog(clock, queuedLog), clock, logLines);
+  std::unique_ptr<Log> log = makeLog(makeQueuedLog(clock, queuedLog), clock, logLines, troubles);
   LogCategory category{*log, "com.orvane.tonewerk", "twrs"};  // the adapters' own lines
   UsdtTracePoints tracePoints;
   ThreadQueueFactory queues;
@@ -125,6 +129,7 @@ LinuxPlatform::~LinuxPlatform() = default;
 
 Log& LinuxPlatform::log() { return *adapters_->log; }
 SinkStatus LinuxPlatform::logStatus() { return adapters_->queuedLog->status(); }
+std::vector<LoggedTrouble> LinuxPlatform::troubles() const { return adapters_->troubles->all(); }
 bool LinuxPlatform::flushLog(std::chrono::milliseconds timeout) {
   return adapters_->queuedLog->flush(timeout);
 }

@@ -3,7 +3,9 @@
 
 #include <chrono>
 #include <memory>
+#include <vector>
 
+#include "platform/DaemonStatus.h"
 #include "platform/Platform.h"
 #include "platform/SinkStatus.h"
 
@@ -30,6 +32,8 @@ class LinuxPlatform {
   Log& log();
   // How the log's queue stands.
   SinkStatus logStatus();
+  // The last different error lines, newest first. Any thread.
+  std::vector<LoggedTrouble> troubles() const;
   // Waits until all lines are written; false after `timeout`. For ends of the process that destroy nothing.
   [[nodiscard]] bool flushLog(std::chrono::milliseconds timeout);
   Accounts& accounts();

@@ -193,6 +193,20 @@ SinkStatus LinuxLinkReport::status() {
   return status;
 }
 
+std::vector<EndpointStatus> LinuxLinkReport::endpoints() {
+  std::vector<EndpointStatus> statuses;
+  const MutexLock lock(mutex_);
+  for (const auto& [url, exporter] : exporters_) {
+    const auto still = std::chrono::floor<std::chrono::seconds>(exporter->stillSince());
+    statuses.push_back({.url = url,
+                        .waiting = exporter->waiting(),
+                        .dropped = exporter->dropped(),
+                        .hangs = still >= kHangTime ? still : std::chrono::seconds(0),
+                        .problem = exporter->problem()});
+  }
+  return statuses;
+}
+
 bool LinuxLinkReport::finish(std::chrono::milliseconds timeout) {
   const auto deadline = std::chrono::steady_clock::now() + timeout;
   std::vector<OtlpExporter*> exporters;

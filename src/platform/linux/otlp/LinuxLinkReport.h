@@ -8,7 +8,9 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <vector>
 
+#include "platform/DaemonStatus.h"
 #include "platform/LinkReport.h"
 #include "platform/SinkStatus.h"
 #include "platform/linux/files/Ulid.h"
@@ -59,6 +61,8 @@ class LinuxLinkReport final : public LinkReport {
   // Any thread. Counts the records for all endpoints. Endpoints hang when one of them has taken no record for
   // kHangTime.
   SinkStatus status();
+  // Any thread. Of each endpoint by itself, in the order of their addresses.
+  std::vector<EndpointStatus> endpoints();
 
   // Sends all waiting records within `timeout`. Nothing is sent after that. False if records are left.
   [[nodiscard]] bool finish(std::chrono::milliseconds timeout);

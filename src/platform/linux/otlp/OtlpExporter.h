@@ -44,6 +44,8 @@ class OtlpExporter {
   std::size_t waiting() const { return outbox_.count(); }
   std::uint64_t dropped() const { return outbox_.allDropped(); }
   std::chrono::nanoseconds stillSince() const;
+  // Any thread. See OtlpSender::problem().
+  std::string problem() const { return sender_.problem(); }
 
   // Starts the end: the thread sends all waiting records, tries failed ones once more, and then stops.
   void beginEnd();

@@ -89,7 +89,7 @@ void OtlpSender::delivered(const OtlpOutbox::Batch& batch, const HttpAnswer& ans
   const std::uint64_t full = outbox_.takeDropped();
   allDropped_ += full;
   const std::uint64_t dropped = std::exchange(dropped_, 0) + full;
-  if (!std::exchange(loggedProblem_, {}).empty() || dropped > 0) {
+  if (!exchangeProblem({}).empty() || dropped > 0) {
     errorLog(log_, "sending to %@ goes on; records dropped meanwhile: %lu", url_, dropped);
   }
   takeAnswer(batch, answer);
@@ -148,9 +148,18 @@ void OtlpSender::drop(const OtlpOutbox::Batch& batch, const std::string& why) {
 }
 
 void OtlpSender::logOnce(const std::string& problem) {
-  if (problem == loggedProblem_) return;
-  loggedProblem_ = problem;
+  if (exchangeProblem(problem) == problem) return;
   errorLog(log_, "sending to %@: %@", url_, problem);
+}
+
+std::string OtlpSender::exchangeProblem(std::string problem) {
+  const MutexLock lock(problemMutex_);
+  return std::exchange(loggedProblem_, std::move(problem));
+}
+
+std::string OtlpSender::problem() const {
+  const MutexLock lock(problemMutex_);
+  return loggedProblem_;
 }
 
 void OtlpSender::skipRetryDelay() {

@@ -11,6 +11,7 @@
 #include "platform/linux/otlp/OtlpLogRecord.h"
 #include "platform/linux/otlp/OtlpOutbox.h"
 #include "platform/linux/otlp/RetryPolicy.h"
+#include "values/Mutex.h"
 
 namespace tonewerk {
 
@@ -39,6 +40,9 @@ class OtlpSender {
   // wait.
   std::optional<OtlpOutbox::Time> sendDue();
 
+  // Any thread. Why the last sending failed; empty while the endpoint accepts records.
+  std::string problem() const;
+
   // Lets the next sendDue() try again at once, unless the endpoint asked for a delay. For the end.
   void skipRetryDelay();
 
@@ -56,6 +60,8 @@ class OtlpSender {
   void split();
   void drop(const OtlpOutbox::Batch& batch, const std::string& why);
   void logOnce(const std::string& problem);
+  // Returns the problem before.
+  std::string exchangeProblem(std::string problem);
 
   const std::string url_;
   OtlpOutbox& outbox_;
@@ -68,10 +74,12 @@ class OtlpSender {
   std::deque<OtlpOutbox::Batch> taken_;  // more than one after a split
   std::optional<OtlpOutbox::Time> notBefore_;
   bool waitIsAsked_ = false;     // whether the endpoint asked for the delay
-  std::string loggedProblem_;    // empty while the endpoint accepts records
   std::string loggedComplaint_;  // about the last answer
   std::uint64_t dropped_ = 0;    // since the last delivery
   std::uint64_t allDropped_ = 0;
+
+  mutable Mutex problemMutex_;
+  std::string loggedProblem_ GUARDED_BY(problemMutex_);  // empty while the endpoint accepts records
 };
 
 }  // namespace tonewerk

@@ -217,6 +217,21 @@ TEST_F(LinuxLinkReportTest, IsQuickWithoutAnEndpoint) {
   EXPECT_FALSE(start()->isQuick());
 }
 
+TEST_F(LinuxLinkReportTest, SaysHowEachEndpointStands) {
+  EXPECT_THAT(service_.endpoints(), IsEmpty());
+  receiver_.answerNext({.fault = OtlpReceiver::Fault::kHang});
+  configure("backends", ValueArray{receiver_.address()});
+  const auto session = start(false);
+  send(*session, {{"a", 1}});
+  ASSERT_TRUE(receiver_.waitForRequests(1));
+  const std::vector<EndpointStatus> endpoints = service_.endpoints();
+  ASSERT_THAT(endpoints, SizeIs(1));
+  EXPECT_EQ(endpoints[0].url, receiver_.address() + "/v1/logs");
+  EXPECT_EQ(endpoints[0].waiting, 1U) << "it is not answered yet";
+  EXPECT_EQ(endpoints[0].dropped, 0U);
+  EXPECT_EQ(endpoints[0].problem, "");
+}
+
 TEST_F(LinuxLinkReportTest, LimitsTheNumberOfAddresses) {
   for (int n = 0; n < 20; ++n) {
     configure("backends", ValueArray{receiver_.address() + "/" + std::to_string(n)});

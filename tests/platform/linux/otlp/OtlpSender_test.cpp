@@ -157,6 +157,17 @@ TEST_F(OtlpSenderTest, NeverGivesUpOnAnEndpointThatIsDown) {
                                     HasSubstr("goes on; records dropped meanwhile: 0")));
 }
 
+TEST_F(OtlpSenderTest, SaysWhyTheLastSendingFailedUntilOneDoesNot) {
+  EXPECT_EQ(sender_.problem(), "");
+  client_.answers = {noAnswer("refused")};
+  add("a");
+  send();
+  EXPECT_EQ(sender_.problem(), "refused; records are kept while there is room");
+  clock_.advance(30.0);
+  EXPECT_EQ(send(), -1.0);
+  EXPECT_EQ(sender_.problem(), "");
+}
+
 TEST_F(OtlpSenderTest, WaitsAsLongAsTheEndpointAsks) {
   client_.answers = {answerOf(429, "", " 60\r\n"), answerOf(503, "", "Thu, 20 Nov 2025 10:20:00 GMT\r\n")};
   add("a");
