@@ -81,12 +81,13 @@ void showAnswer(std::string_view bytes) {
     printer.printMissed(maps.size());
   });
   show([&](const Tool& tool) {
-    SinkTable table(tool);
-    for (const ValueMap& map : maps) table.add(map);
-  });
-  show([&](const Tool& tool) {
-    AccountTable table(tool);
-    for (const ValueMap& map : maps) table.add(map);
+    if (tool.asJson) return;  // these tables are for people
+    SinkTable sinks(tool.out);
+    AccountTable accounts(tool.out);
+    for (const ValueMap& map : maps) {
+      sinks.add(map);
+      accounts.add(map);
+    }
   });
   showSessions(maps);
 }

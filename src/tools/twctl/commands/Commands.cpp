@@ -25,7 +25,7 @@ int runCommandLine(int argc, const char* const* argv, Tool& tool) {
   app.footer(
       "Exit status: 0 done; 1 refused, not valid, not there, or output that cannot be written; 2 wrong\n"
       "usage, a wrong query or recording included; 3 no daemon answers.");
-  app.require_subcommand(1);
+  app.require_subcommand(0, 1);
   addCommonOptions(app, tool);
   addStatusCommand(app, tool);
   addListCommand(app, tool);

@@ -13,6 +13,7 @@ namespace tonewerk {
 
 // Add the tool's commands, each of which has a file of its own, to `app` and declare their arguments. A
 // command runs when the command line names it, and sets the exit status in `tool`, which outlives `app`.
+// Also runs when there is no command.
 void addStatusCommand(CLI::App& app, Tool& tool);
 void addListCommand(CLI::App& app, Tool& tool);
 void addValidateCommand(CLI::App& app, Tool& tool);

@@ -1,65 +1,58 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <CLI/CLI.hpp>
+#include <chrono>
 #include <optional>
 #include <ostream>
+#include <string>
 
-#include "protocol/Requests.h"
-#include "protocol/WatchKeys.h"
-#include "tools/twctl/DaemonCalls.h"
 #include "tools/twctl/commands/Commands.h"
-#include "tools/twctl/show/AccountTable.h"
-#include "tools/twctl/show/SinkTable.h"
+#include "tools/twctl/health/BridgeProcesses.h"
+#include "tools/twctl/health/DaemonReport.h"
+#include "tools/twctl/health/StatusReport.h"
+#include "tools/twctl/health/StoreBound.h"
+#include "tools/twctl/health/StoreFacts.h"
+#include "tools/twctl/show/Terminal.h"
+#include "values/CompactJson.h"
+#include "values/PrintableText.h"
 
 namespace tonewerk {
 namespace {
 
-void showSinks(Tool& tool, const ValueMap& listing) {
-  const Value* found = listing.find(kWatchKeySinks);
-  const ValueArray* sinks = found == nullptr ? nullptr : found->asArray();
-  if (sinks == nullptr || sinks->empty()) return;
-  if (!tool.asJson) tool.out << "\n";
-  SinkTable table(tool);
-  for (const Value& sink : *sinks) {
-    if (sink.asMap() != nullptr) table.add(*sink.asMap());
+int showStatus(const Tool& tool) {
+  StatusReport report;
+  report.daemon = askDaemon(tool);
+  const Directories directories = report.daemon.directoriesOr(tool.directories());
+  report.store = readStoreFacts(directories.state);
+  report.storeMegabytes = storeMegabytes(directories);
+  report.bridges = findBridges();
+  report.now = std::chrono::duration<double>(std::chrono::system_clock::now().time_since_epoch()).count();
+  report.ownVersion = TONEWERK_VERSION;
+  if (tool.asJson) {
+    std::string text;
+    appendCompactJson(text, report.forPrograms());
+    tool.out << printable(std::move(text)) << '\n';
+  } else {
+    const auto size = tool.outIsTerminal ? terminalSizeOf(tool.outDescriptor) : std::nullopt;
+    report.print(tool.out, size ? std::optional(size->columns) : std::nullopt);
   }
-}
-
-void showStatus(Tool& tool) {
-  DaemonCalls daemon(tool);
-  std::optional<Value> answer;
-  if (!daemon.connect(DaemonCalls::Role::kOnlooker) ||
-      !daemon.call(requests::kWatchAccounts.name, {}, answer))
-    return;
-  const ValueMap* listing = answer ? answer->asMap() : nullptr;
-  const Value* found = listing == nullptr ? nullptr : listing->find(kWatchKeyAccounts);
-  const ValueArray* accounts = found == nullptr ? nullptr : found->asArray();
-  if (accounts == nullptr) return;
-  {
-    AccountTable table(tool);
-    for (const Value& account : *accounts) {
-      if (account.asMap() != nullptr) table.add(*account.asMap());
-    }
-  }
-  const auto total = static_cast<std::uint64_t>(listing->integer(kWatchKeyTotal));
-  if (total > accounts->size() && !tool.asJson) {
-    tool.out << "and " << total - accounts->size() << " more users\n";
-  }
-  showSinks(tool, *listing);
+  if (!report.daemon.isConnected) return tool.fail(kNoDaemon, report.daemon.problem);
+  return report.problems().empty() ? kDone : kRefused;
 }
 
 }  // namespace
 
 void addStatusCommand(CLI::App& app, Tool& tool) {
   CLI::App& command =
-      addCommand(app, tool, "status", "What each user holds in the daemon, and how its sinks stand");
+      addCommand(app, tool, "status", "How the daemon stands, its store, its sinks, and what is wrong");
   command.footer(
-      "A row for each thing that a user's clients hold: how much, the most they may hold now, and how often\n"
-      "more was refused. Trusted users see all users, others themselves. Trusted users see a second table, "
-      "with\n"
-      "a row for each sink of reports: how much waits to be written, how much was dropped because the sink "
-      "did\n"
-      "not take it, and for how many seconds it has hung.");
-  command.callback([&tool] { showStatus(tool); });
+      "Without a command, twctl is twctl status. Exit status: 0 well; 1 something is wrong; 3 no daemon.\n"
+      "For each user it shows what is held, the most that may be held now, and how often more was refused;\n"
+      "trusted users see all users, others themselves. Only trusted users see the sinks (what waits to be\n"
+      "written, what was dropped, for how long it hangs), the endpoints, and the last errors of the daemon.");
+  command.callback([&tool] { tool.status = showStatus(tool); });
+  app.callback([&app, &tool] {
+    if (app.get_subcommands().empty()) tool.status = showStatus(tool);
+  });
 }
 
 }  // namespace tonewerk

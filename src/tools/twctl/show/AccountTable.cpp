@@ -4,28 +4,18 @@
 #include <array>
 #include <cstdint>
 #include <cstdio>
-#include <pwd.h>
 #include <string>
 #include <string_view>
 #include <vector>
 
-#include "protocol/RequestSet.h"
 #include "protocol/WatchKeys.h"
+#include "tools/twctl/show/UserName.h"
 #include "values/PrintableText.h"
 
 namespace tonewerk {
 namespace {
 
 constexpr std::string_view kLogLines = "logLines";
-
-std::string nameOf(std::uint64_t user) {
-  if (user == kNoUser) return "(unknown)";
-  std::array<char, 4096> texts{};
-  passwd entry{};
-  passwd* found = nullptr;
-  if (::getpwuid_r(static_cast<uid_t>(user), &entry, texts.data(), texts.size(), &found) != 0) return "";
-  return found == nullptr ? "" : printable(found->pw_name);
-}
 
 std::string amountText(std::uint64_t amount, bool isBytes) {
   if (!isBytes) return std::to_string(amount);
@@ -51,8 +41,8 @@ std::uint64_t numberUnder(const SharedString& key, const ValueMap& map) {
 
 }  // namespace
 
-AccountTable::AccountTable(const Tool& tool)
-    : table_(tool.out, tool.asJson, {"user", "name", "trusted", "resource", "held", "share", "refused"}) {}
+AccountTable::AccountTable(std::ostream& out)
+    : table_(out, false, {"user", "resource", "held", "share", "refused"}) {}
 
 void AccountTable::add(const ValueMap& account) {
   if (const Value* list = account.find(kWatchKeyResources); list != nullptr && list->asArray() != nullptr) {
@@ -71,11 +61,8 @@ void AccountTable::add(const ValueMap& account) {
 
 void AccountTable::addRow(const ValueMap& account, const std::string& resource, const Table::Cell& held,
                           const Table::Cell& share, std::uint64_t refused) {
-  const std::uint64_t user = numberUnder(kWatchKeyUser, account);
-  const bool isTrusted = account.boolean(kWatchKeyTrusted);
-  table_.add({Value(user), Value(nameOf(user)),
-              Table::Cell(isTrusted ? "yes" : "no", isTrusted ? "true" : "false"), Value(printable(resource)),
-              held, share, Value(refused)});
+  table_.add({Value(userName(numberUnder(kWatchKeyUser, account))), Value(printable(resource)), held, share,
+              Value(refused)});
 }
 
 }  // namespace tonewerk

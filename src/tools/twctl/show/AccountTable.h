@@ -1,7 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
-#include "tools/twctl/Tool.h"
+#include <cstddef>
+#include <cstdint>
+#include <iosfwd>
+#include <string>
+
 #include "tools/twctl/show/Table.h"
 
 namespace tonewerk {
@@ -11,7 +15,10 @@ class ValueMap;
 // Prints the users' accounts for `twctl status`: a row for each resource that a user holds or was refused.
 class AccountTable {
  public:
-  explicit AccountTable(const Tool& tool);
+  explicit AccountTable(std::ostream& out);
+
+  // See Table::fit().
+  void fit(std::size_t width) { table_.fit(width); }
 
   // `account` is one of the answer to watch.accounts.
   void add(const ValueMap& account);

@@ -9,8 +9,7 @@
 
 namespace tonewerk {
 
-SinkTable::SinkTable(const Tool& tool)
-    : table_(tool.out, tool.asJson, {"sink", "waiting", "dropped", "hangs"}) {}
+SinkTable::SinkTable(std::ostream& out) : table_(out, false, {"sink", "waiting", "dropped", "hangs"}) {}
 
 void SinkTable::add(const ValueMap& sink) {
   const std::int64_t seconds = sink.integer(kWatchKeyHangs);
