@@ -76,7 +76,7 @@ TEST_F(TwctlTest, EveryCommandHelps) {
   const std::vector<std::string> commands{
       "list",   "validate",  "send",     "replay", "record",   "top",    "tail",
       "events", "metrics",   "power",    "rtc",    "defaults", "notify", "captures",
-      "drafts", "whirlcaps", "channels", "paths",  "kill",     "status"};
+      "drafts", "whirlcaps", "channels", "paths",  "kill",     "status", "doctor"};
   EXPECT_EQ(run({"--help"}), kDone);
   for (const std::string& name : commands) {
     SCOPED_TRACE(name);

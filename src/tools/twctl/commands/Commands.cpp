@@ -28,6 +28,7 @@ int runCommandLine(int argc, const char* const* argv, Tool& tool) {
   app.require_subcommand(0, 1);
   addCommonOptions(app, tool);
   addStatusCommand(app, tool);
+  addDoctorCommand(app, tool);
   addListCommand(app, tool);
   addValidateCommand(app, tool);
   addSendCommand(app, tool);

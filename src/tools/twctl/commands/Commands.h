@@ -15,6 +15,7 @@ namespace tonewerk {
 // command runs when the command line names it, and sets the exit status in `tool`, which outlives `app`.
 // Also runs when there is no command.
 void addStatusCommand(CLI::App& app, Tool& tool);
+void addDoctorCommand(CLI::App& app, Tool& tool);
 void addListCommand(CLI::App& app, Tool& tool);
 void addValidateCommand(CLI::App& app, Tool& tool);
 void addSendCommand(CLI::App& app, Tool& tool);
