@@ -52,7 +52,6 @@ TEST_F(CommandLineTest, SaysThatItCouldNotWrite) {
 
 TEST_F(CommandLineTest, CallsWrongUsageWrong) {
   for (const std::vector<std::string>& wrong : std::vector<std::vector<std::string>>{
-           {},
            {"frob"},
            {"list", "more"},
            {"validate"},
@@ -96,7 +95,6 @@ TEST_F(CommandLineTest, CallsWrongUsageWrong) {
 // It printed "--watch: --watch:", and for an unknown command that a command is required.
 TEST_F(CommandLineTest, SaysInOneLineWhatIsWrong) {
   const std::vector<std::pair<std::vector<std::string>, std::string>> wrong{
-      {{}, "a command is required; see twctl --help"},
       {{"defaults"}, "a command is required; see twctl defaults --help"},
       {{"evnts"}, "unknown command 'evnts'; did you mean 'events'?"},
       {{"nonsense"}, "unknown command 'nonsense'"},
