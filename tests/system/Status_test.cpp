@@ -42,11 +42,11 @@ class StatusTest : public DaemonTest {
          {"CONFIGURATION_DIRECTORY", daemon.path(DaemonProcess::kConfiguration)},
          {"PATH", directory.path()}}};  // no systemctl, whose answers are the machine's
     if (!process.start(command, directory.path("output"), directory.path("errors"))) return {};
-    const std::optional<int> status = process.wait();
+    const std::optional<int> exit = process.wait();
     output = textOfFile(directory.path("output"));
     errors = textOfFile(directory.path("errors"));
     expectNoSanitizerReport(errors);
-    return status;
+    return exit;
   }
 
   // What `twctl doctor` finds, by name, beside what is the machine's.

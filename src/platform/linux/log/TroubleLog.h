@@ -32,8 +32,8 @@ class RecentTroubles {
   std::list<LoggedTrouble> lines_ GUARDED_BY(mutex_);  // newest first
 };
 
-// Passes lines on to another log, and keeps those at error level in `troubles`. A line belongs to the user for
-// whom its thread works (platform/accounts/WorkingFor.h).
+// Passes lines on to another log, and keeps those at error level in `troubles`. A line belongs to the user
+// for whom its thread works (platform/accounts/WorkingFor.h).
 class TroubleLog final : public Log {
  public:
   // `clock` outlives the log.

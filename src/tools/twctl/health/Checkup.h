@@ -57,6 +57,8 @@ struct Checkup {
   uid_t daemonUser() const;
   // "systemctl --user" or "sudo systemctl", and "twctl" or "sudo twctl --system".
   std::string systemctl() const;
+  // How to end the daemon and start it again. No unit has a daemon with directories of its own.
+  std::string restart() const;
   std::string twctl() const;
 };
 

@@ -7,17 +7,21 @@
 #include <filesystem>
 #include <map>
 #include <sstream>
+#include <string_view>
 #include <sys/stat.h>
 #include <utility>
 
 #include "protocol/WatchKeys.h"
 #include "tools/twctl/health/Checkup.h"
+#include "tools/twctl/show/UserName.h"
 
 namespace tonewerk {
 namespace {
 
 constexpr const char* kSocketUnit = "twreportingd.socket";
 constexpr const char* kServiceUnit = "twreportingd.service";
+// A socket of root's own daemon is no reason to become root.
+constexpr std::string_view kRootGroup = "root";
 constexpr const char* kBridgeUnit = "tw-pipewire.service";
 
 // Returns a variable that decides where clients look; none when none is set.
@@ -38,12 +42,12 @@ void addForbidden(const Checkup& checkup, const std::string& path, Findings& fin
   if (!isInGroup && around.isMember(status.st_gid)) {
     findings.add("old-login", path + ": you are in the group " + group + ", but this login is older",
                  "newgrp " + group + ", or log in again");
-  } else if (!isInGroup && (status.st_mode & S_IWGRP) != 0) {
+  } else if (!isInGroup && (status.st_mode & S_IWGRP) != 0 && group != kRootGroup) {
     findings.add("forbidden-socket", path + " is for the group " + group + ", and you are not in it",
                  "sudo usermod -aG " + group + " $USER, and log in again");
   } else {
-    findings.add("forbidden-socket", path + " is for user " + std::to_string(status.st_uid) + " only",
-                 "unset XDG_RUNTIME_DIR, or use the system's daemon: twctl --system status");
+    findings.add("forbidden-socket", path + " is for " + userName(status.st_uid) + " only",
+                 "start a daemon of your own, or use the system's: twctl --system");
   }
 }
 
@@ -131,7 +135,7 @@ void checkSocket(const Checkup& checkup, Findings& findings) {
 void checkDaemon(const Checkup& checkup, Findings& findings) {
   const DaemonReport& daemon = checkup.daemon;
   if (!daemon.isConnected) return;
-  const std::string restart = checkup.systemctl() + " restart " + kServiceUnit;
+  const std::string restart = checkup.restart();
   if (!daemon.answers) return findings.add("silent-daemon", daemon.problem, restart);
   const std::string version = daemon.daemon.text(kWatchKeyVersion);
   if (version != checkup.ownVersion)

@@ -2,6 +2,7 @@
 #include "tools/twctl/health/DaemonReport.h"
 
 #include <chrono>
+#include <cstdlib>
 #include <system_error>
 
 #include "protocol/Requests.h"
@@ -77,6 +78,18 @@ DaemonReport askDaemon(const Tool& tool) {
   if (sessions && sessions->result && sessions->result->asMap() != nullptr)
     report.sessions = arrayUnder(kWatchKeySessions, *sessions->result->asMap());
   return report;
+}
+
+std::string daemonMode(const ValueMap& daemon) {
+  const std::string state = daemon.text(kWatchKeyState);
+  if (state == Directories::system().state) return "system";
+  // Without the variables that a service manager sets, as in another session of the user.
+  const auto variable = [](const std::string& name) -> std::optional<std::string> {
+    const char* value = name.ends_with("_DIRECTORY") ? nullptr : std::getenv(name.c_str());
+    return value == nullptr ? std::nullopt : std::optional<std::string>(value);
+  };
+  const Directories own = Directories::from(variable, static_cast<uid_t>(daemon.integer(kWatchKeyUser)));
+  return state == own.state ? "user" : "private";
 }
 
 std::vector<ValueMap> mapsIn(const ValueArray& array) {

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <cstdint>
 #include <optional>
 #include <string>
 #include <vector>
@@ -35,6 +36,10 @@ struct DaemonReport {
 
 // Reads an answer to watch.accounts.
 [[nodiscard]] DaemonReport reportOf(const ValueMap& listing);
+
+// Returns whose directories a daemon has that says "user" and "state": "system", "user" (those of its user,
+// as without variables), or "private".
+std::string daemonMode(const ValueMap& daemon);
 
 // Returns the maps in an array, and leaves out what is no map.
 std::vector<ValueMap> mapsIn(const ValueArray& array);

@@ -23,8 +23,7 @@ void checkPlace(const Checkup& checkup, const Place& place, Findings& findings) 
   if (stat(place.path.c_str(), &status) != 0) {
     if (errno != ENOENT) return findings.couldNotSee(place.path + ": " + std::strerror(errno));
     if (place.mustExist && checkup.daemon.answers)
-      findings.add("missing-directory", place.path + " is missing",
-                   checkup.systemctl() + " restart twreportingd.service");
+      findings.add("missing-directory", place.path + " is missing", checkup.restart());
     return;
   }
   const uid_t user = checkup.daemonUser();

@@ -101,4 +101,8 @@ void Findings::add(std::string_view name, std::string what, std::string remedy) 
   all_.push_back({&*kind, std::move(what), std::move(remedy)});
 }
 
+void Findings::couldNotSee(std::string what) {
+  if (std::find(unseen_.begin(), unseen_.end(), what) == unseen_.end()) unseen_.push_back(std::move(what));
+}
+
 }  // namespace tonewerk

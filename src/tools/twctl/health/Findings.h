@@ -30,8 +30,8 @@ class Findings {
  public:
   // `name` must be that of a kind. Without `remedy` the kind's own holds.
   void add(std::string_view name, std::string what, std::string remedy = {});
-  // Says what the caller may not look at.
-  void couldNotSee(std::string what) { unseen_.push_back(std::move(what)); }
+  // Says what the caller may not look at. The same is said once.
+  void couldNotSee(std::string what);
 
   const std::vector<Finding>& all() const { return all_; }
   const std::vector<std::string>& unseen() const { return unseen_; }

@@ -180,7 +180,7 @@ void checkFacts(const Checkup& checkup, Findings& findings) {
     findings.add("old-fact",
                  std::string("InternalBuild is ") + (isInternal ? "true" : "false") +
                      " now, and was not when the daemon started",
-                 checkup.systemctl() + " restart twreportingd.service");
+                 checkup.restart());
 }
 
 void checkEndpoints(const Checkup& checkup, Findings& findings) {

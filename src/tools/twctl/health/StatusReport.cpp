@@ -6,7 +6,6 @@
 #include <cmath>
 #include <cstdint>
 #include <cstdio>
-#include <cstdlib>
 #include <ctime>
 #include <ostream>
 #include <string_view>
@@ -32,18 +31,6 @@ std::string whole(double number) { return std::to_string(static_cast<std::int64_
 
 std::string counted(std::int64_t count, const std::string& one, const std::string& several) {
   return std::to_string(count) + " " + (count == 1 ? one : several);
-}
-
-std::string modeOf(const ValueMap& daemon) {
-  const Directories system = Directories::system();
-  if (daemon.text(kWatchKeyState) == system.state) return "system";
-  const auto own = Directories::from(
-      [](const std::string& name) -> std::optional<std::string> {
-        const char* value = name.ends_with("_DIRECTORY") ? nullptr : std::getenv(name.c_str());
-        return value == nullptr ? std::nullopt : std::optional<std::string>(value);
-      },
-      static_cast<uid_t>(daemon.integer(kWatchKeyUser)));
-  return daemon.text(kWatchKeyState) == own.state ? "user" : "private";
 }
 
 std::string_view textOfMode(std::string_view mode) {
@@ -78,7 +65,7 @@ ValueMap daemonForPrograms(const DaemonReport& report) {
   ValueMap map{{"answers", report.answers}};
   if (!report.answers) map.set("problem", report.problem);
   map.merge(report.daemon);
-  if (!report.daemon.empty()) map.set("mode", modeOf(report.daemon));
+  if (!report.daemon.empty()) map.set("mode", daemonMode(report.daemon));
   return map;
 }
 
@@ -98,7 +85,7 @@ void printDaemon(const StatusReport& report, WrappedLines& lines) {
                           daemon.text(kWatchKeyProcessIdentifier) + " of " +
                           userName(static_cast<std::uint64_t>(daemon.integer(kWatchKeyUser))));
   lines.add("", "since " + localTimeOf(report.now - seconds) + ", for " + durationText(seconds));
-  lines.add("mode", std::string(textOfMode(modeOf(daemon))) +
+  lines.add("mode", std::string(textOfMode(daemonMode(daemon))) +
                         (daemon.boolean(kWatchKeyInternalBuild) ? "; an internal build" : ""));
 }
 

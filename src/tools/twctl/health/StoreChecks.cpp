@@ -107,8 +107,7 @@ void checkStore(const Checkup& checkup, Findings& findings) {
   if (store.isForbidden) {
     findings.couldNotSee(store.path + ": " + store.problem);
   } else if (!store.problem.empty()) {
-    findings.add("unreadable-store", store.path + ": " + store.problem,
-                 checkup.systemctl() + " restart twreportingd.service");
+    findings.add("unreadable-store", store.path + ": " + store.problem, checkup.restart());
   }
   if (store.newerSchema)
     findings.add("newer-store", "a daemon with schema " + std::to_string(*store.newerSchema) +

@@ -51,6 +51,10 @@ TEST_F(DaemonChecksTest, FindThatTheCallerIsNotInTheGroupOfTheSocket) {
   EXPECT_THAT(remedies, ElementsAre("sudo usermod -aG audio $USER, and log in again"));
   isMember = true;
   EXPECT_THAT(find(checkSocket), ElementsAre(StartsWith("old-login: ")));
+  isMember = false;
+  checkup.around.groupName = [](gid_t) { return "root"; };
+  EXPECT_THAT(find(checkSocket), ElementsAre(StartsWith("forbidden-socket: ")));
+  EXPECT_THAT(remedies, ElementsAre(testing::Not(HasSubstr("usermod")))) << "nobody is told to become root";
 }
 
 TEST_F(DaemonChecksTest, FindAVariableThatLeadsAwayFromTheDaemon) {
@@ -80,6 +84,10 @@ TEST_F(DaemonChecksTest, FindADaemonThatDoesNotAnswer) {
 TEST_F(DaemonChecksTest, FindADaemonOfAnotherVersion) {
   checkup.ownVersion = "1.1";
   EXPECT_THAT(find(checkDaemon), ElementsAre("other-version: the daemon has the version 1.0, twctl 1.1"));
+  EXPECT_THAT(remedies, ElementsAre("systemctl --user restart twreportingd.service"));
+  checkup.daemon.daemon.set("state", directory.path("state"));
+  (void)find(checkDaemon);
+  EXPECT_THAT(remedies, ElementsAre(StartsWith("twctl kill"))) << "it is no unit's";
   checkup.daemon.daemon = {};
   EXPECT_THAT(find(checkDaemon), ElementsAre(HasSubstr("of an older release")));
 }

@@ -35,6 +35,15 @@ TEST_F(DirectoryChecksTest, FindWhatBelongsToAnotherUser) {
   EXPECT_EQ(remedies[0], "sudo chown 3999999: " + directory.path("runtime"));
 }
 
+TEST_F(DirectoryChecksTest, TakeTheOwnerOfTheSocketForADaemonThatCannotBeAsked) {
+  checkup.daemon = {};
+  checkup.around.user = 3'999'999;
+  write("runtime/reporting.sock", "");
+  EXPECT_THAT(find(checkDirectories), IsEmpty()) << "all of it is of one user";
+  std::filesystem::remove(directory.path("runtime/reporting.sock"));
+  EXPECT_THAT(find(checkDirectories), testing::Contains(StartsWith("foreign-owner: "))) << "the caller's";
+}
+
 TEST_F(DirectoryChecksTest, FindWhatEveryUserMayWrite) {
   allow("state", 0757);
   EXPECT_THAT(find(checkDirectories),

@@ -17,6 +17,14 @@ TEST(FindingsTest, EachKindHasANameOfItsOwnAndIsWhole) {
   }
 }
 
+TEST(FindingsTest, WhatCannotBeSeenIsSaidOnce) {
+  Findings findings;
+  findings.couldNotSee("a");
+  findings.couldNotSee("b");
+  findings.couldNotSee("a");
+  EXPECT_THAT(findings.unseen(), testing::ElementsAre("a", "b"));
+}
+
 TEST(FindingsTest, AFindingHasItsOwnRemedyOrThatOfItsKind) {
   Findings findings;
   findings.add("no-daemon", "there is none");
