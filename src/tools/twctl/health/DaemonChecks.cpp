@@ -78,14 +78,19 @@ std::optional<Units> showUnits(const Checkup& checkup, bool isSystem, const std:
   return text ? std::optional(parseUnits(*text)) : std::nullopt;
 }
 
+std::string startAgain(const Checkup& checkup, const std::string& unit) {
+  const std::string systemctl = checkup.systemctl();
+  return systemctl + " reset-failed " + unit + "; " + systemctl + " start " + unit;
+}
+
 void addFailed(const Checkup& checkup, const Units& units, Findings& findings) {
   for (const auto& [name, properties] : units) {
     const auto state = properties.find("ActiveState");
     if (state == properties.end() || state->second != "failed") continue;
     const auto result = properties.find("Result");
-    findings.add(
-        "failed-unit", name + " has failed" + (result == properties.end() ? "" : " (" + result->second + ")"),
-        checkup.systemctl() + " reset-failed " + name + "; " + checkup.systemctl() + " start " + name);
+    findings.add("failed-unit",
+                 name + " has failed" + (result == properties.end() ? "" : " (" + result->second + ")"),
+                 startAgain(checkup, name));
   }
 }
 

@@ -22,6 +22,9 @@ namespace {
 
 constexpr std::string_view kEnding = ".toml";
 
+// What is wrong in a file.
+std::string inFile(const std::string& path, const std::string& problem) { return path + ": " + problem; }
+
 // Reads a file, and adds why it cannot be read. None then, and when there is none.
 std::optional<ValueMap> readToml(const Checkup& checkup, const std::string& path, Findings& findings) {
   std::string text;
@@ -67,7 +70,8 @@ class PreferenceFiles {
     }
     std::sort(names.begin(), names.end());
     for (const std::string& name : names)
-      checkFile(directory + "/" + name, name.substr(0, name.size() - kEnding.size()), isWritten);
+      checkFile(std::filesystem::path(directory) / name, name.substr(0, name.size() - kEnding.size()),
+                isWritten);
   }
 
  private:
@@ -85,12 +89,15 @@ class PreferenceFiles {
     for (const ValueMap::Entry& entry : *values) {
       const std::string key = entry.key.string();
       for (const std::string& line : unknownKeys(domain, {{entry.key, entry.value}})) {
-        findings_.add("unknown-key", path + ": " + line,
-                      isWritten ? remove + key : "rename or remove " + key + " in " + path);
+        findings_.add("unknown-key", inFile(path, line), isWritten ? remove + key : mend(path, key));
       }
       for (const std::string& line : preferenceProblems(domain, key, entry.value))
         addWrong(path, domain, key, line);
     }
+  }
+
+  static std::string mend(const std::string& path, const std::string& key) {
+    return "rename or remove " + key + " in " + path;
   }
 
   void addWrong(const std::string& path, const std::string& domain, const std::string& key,
@@ -168,11 +175,11 @@ void checkFacts(const Checkup& checkup, Findings& findings) {
   bool isInternal = false;
   for (const ValueMap::Entry& entry : facts.value_or(ValueMap())) {
     for (const std::string& line : unknownKeys(kDeviceFacts, {{entry.key, entry.value}}))
-      findings.add("wrong-fact", path + ": " + line, edit);
+      findings.add("wrong-fact", inFile(path, line), edit);
     const Preference* known = findPreference(kDeviceFacts, entry.key.view());
     if (known == nullptr) continue;
     const std::optional<std::string> problem = problemWith(*known, entry.value);
-    if (problem) findings.add("wrong-fact", path + ": " + *problem, edit);
+    if (problem) findings.add("wrong-fact", inFile(path, *problem), edit);
     if (entry.key.view() == "InternalBuild" && !problem) isInternal = *entry.value.asBoolean();
   }
   const Value* running = checkup.daemon.daemon.find(kWatchKeyInternalBuild);

@@ -71,6 +71,7 @@ ValueMap daemonForPrograms(const DaemonReport& report) {
 
 ValueArray bridgesForPrograms(const std::vector<BridgeProcess>& bridges) {
   std::vector<Value> listed;
+  listed.reserve(bridges.size());
   for (const BridgeProcess& bridge : bridges)
     listed.emplace_back(ValueMap{{"processIdentifier", bridge.identifier}, {"user", bridge.user}});
   return ValueArray(std::move(listed));
