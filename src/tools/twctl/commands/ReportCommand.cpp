@@ -1,8 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <CLI/CLI.hpp>
-#include <array>
-#include <chrono>
-#include <climits>
 #include <filesystem>
 #include <memory>
 #include <optional>
@@ -10,15 +7,12 @@
 #include <string>
 #include <sys/stat.h>
 #include <system_error>
-#include <unistd.h>
 #include <utility>
 
 #include "platform/linux/files/LinuxFileSystem.h"
 #include "tools/twctl/commands/Commands.h"
-#include "tools/twctl/commands/RecordedDevice.h"
+#include "tools/twctl/commands/ReportReading.h"
 #include "tools/twctl/input/TimeRangeOptions.h"
-#include "tools/twctl/report/DaemonHealth.h"
-#include "tools/twctl/report/ReportData.h"
 #include "tools/twctl/report/ReportPage.h"
 #include "values/CompactJson.h"
 #include "values/PrintableText.h"
@@ -28,9 +22,7 @@ namespace {
 
 struct ReportOptions {
   std::optional<std::string> file;
-  std::optional<std::int64_t> session;
-  std::optional<std::string> application;
-  TimeRangeOptions range;
+  ReportScopeOptions scope;
 };
 
 // Makes files that only their owner may read: a page says what people at this device listened to, and when.
@@ -58,46 +50,16 @@ std::error_code writeFile(const std::string& file, const std::string& text) {
   return error;
 }
 
-std::string hostName() {
-  std::array<char, HOST_NAME_MAX + 1> name{};
-  return gethostname(name.data(), name.size() - 1) == 0 ? name.data() : "";
-}
-
-ValueMap deviceOf(const Tool& tool) {
-  ValueMap device{{"host", hostName()}};
-  const ValueMap recorded = recordedDevice(tool, geteuid());
-  const Value* preferences = recorded.find("preferences");
-  const Value* domain = preferences == nullptr ? nullptr : preferences->asMap()->find("com.orvane.tonewerk");
-  if (domain != nullptr && domain->asMap()->contains("device_name"))
-    device.set("name", domain->asMap()->text("device_name"));
-  return device;
-}
-
-ValueMap filterOf(const ReportScope& scope) {
-  ValueMap filter;
-  if (scope.since) filter.set("since", *scope.since);
-  if (scope.until) filter.set("until", *scope.until);
-  if (scope.application) filter.set("application", *scope.application);
-  return filter;
-}
-
 int report(Tool& tool, const ReportOptions& options) {
-  const std::optional<TimeRangeOptions::Range> range = options.range.range(tool);
-  if (!range) return tool.status;
+  const std::optional<ReportScope> scope = options.scope.scope(tool);
+  if (!scope) return tool.status;
   if (!options.file && !tool.asJson && tool.outIsTerminal) {
     return tool.fail(kWrongUsage,
                      "report: a page is no text for a terminal; name a file with -o report.html, or send the "
                      "page on: twctl report > report.html");
   }
-  const ReportScope scope{range->since, range->until, options.application, options.session};
-  const double now =
-      std::chrono::duration<double>(std::chrono::system_clock::now().time_since_epoch()).count();
-  ReportData report = ReportData::read(tool.directories().state, scope, now);
+  const ReportData report = readReport(tool, *scope, reportedDevice(tool));
   if (!report.problem.empty()) return tool.fail(kRefused, report.problem);
-  report.data.set("version", TONEWERK_VERSION);
-  report.data.set("device", deviceOf(tool));
-  report.data.set("filter", filterOf(scope));
-  report.data.set("daemon", daemonHealth(tool));
   std::string text;
   if (tool.asJson) {
     appendCompactJson(text, report.data);
@@ -127,14 +89,7 @@ void addReportCommand(CLI::App& app, Tool& tool) {
       std::string(TimeRangeOptions::kForms));
   const auto options = std::make_shared<ReportOptions>();
   command.add_option("-o,--output", options->file, "The page to make")->type_name("FILE");
-  command
-      .add_option("--session", options->session,
-                  "Only this session: the id of the store's view session, which the page shows as #ID")
-      ->type_name("ID")
-      ->check(CLI::PositiveNumber);
-  command.add_option("--app", options->application, "Only applications that this pattern fits (*, ?, [...])")
-      ->type_name("GLOB");
-  options->range.addTo(command, "what happened");
+  options->scope.addTo(command);
   command.callback([&tool, options] { tool.status = report(tool, *options); });
 }
 

@@ -28,8 +28,12 @@ bool readTime(Tool& tool, const char* option, const std::optional<std::string>& 
 }  // namespace
 
 void TimeRangeOptions::addTo(CLI::App& command, const std::string& what) {
-  command.add_option("--since", since_, "Only " + what + " from this time on");
+  addSinceTo(command, what);
   command.add_option("--until", until_, "Only " + what + " up to this time");
+}
+
+void TimeRangeOptions::addSinceTo(CLI::App& command, const std::string& what) {
+  command.add_option("--since", since_, "Only " + what + " from this time on");
 }
 
 std::optional<TimeRangeOptions::Range> TimeRangeOptions::range(Tool& tool) const {

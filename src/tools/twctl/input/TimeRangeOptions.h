@@ -24,6 +24,8 @@ class TimeRangeOptions {
   // Declares the options for `command`. `what`: whose times they limit, in the plural. This object outlives
   // `command`.
   void addTo(CLI::App& command, const std::string& what);
+  // The same without --until.
+  void addSinceTo(CLI::App& command, const std::string& what);
 
   // None when an option is wrong, or the range ends before it begins; the problem is then printed.
   [[nodiscard]] std::optional<Range> range(Tool& tool) const;
