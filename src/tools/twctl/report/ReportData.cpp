@@ -321,6 +321,19 @@ ValueMap sessionFacts(ReportTables& tables) {
   return facts;
 }
 
+ValueMap runningPlayback(ReportTables& tables) {
+  return tables.list(
+      "reporter:i started:d at:d running:i volume:d device:t ringer:i",
+      "SELECT s.reporter_id, s.started_at, coalesce(e.payload ->> 'twreporting_timestamp', e.at), e.payload "
+      "->> 'session_output_running' AS running, e.payload ->> 'QMSessionVolume' AS volume, e.payload ->> "
+      "'active_devices' AS device, e.payload ->> 'ringerstate' AS ringer FROM (SELECT id, reporter_id, "
+      "started_at FROM shown WHERE ending IS NULL ORDER BY started_at DESC" +
+          limit(ReportData::kMostRunning) +
+          ") AS s JOIN main.event AS e ON e.session = s.id WHERE e.source = 'client' AND coalesce(running, "
+          "volume, device, ringer) IS NOT NULL ORDER BY e.id DESC" +
+          limit(ReportData::kMostSaid));
+}
+
 // "session 12 is not in ...", with the sessions that a reader may have meant.
 std::string unknownSession(ReportTables& tables, std::int64_t session) {
   std::string similar;
@@ -364,6 +377,7 @@ ReportData ReportData::read(const std::string& directory, const ReportScope& sco
   data.set("drivers", drivers(tables));
   data.set("haptics", haptics(tables));
   if (scope.session) data.set("session", sessionFacts(tables));
+  if (scope.hasRunning) report.running = runningPlayback(tables);
   report.problem = tables.problem();
   return report;
 }

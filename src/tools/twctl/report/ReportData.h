@@ -10,7 +10,10 @@ namespace tonewerk {
 
 // What a report says of the store: everything that its pictures, tables and sentences show.
 struct ReportData {
-  ValueMap data;        // for the page; docs/report.md describes what it shows
+  ValueMap data;  // for the page; docs/report.md describes what it shows
+  // On demand: what the sessions that still run have said of playback, newest first, as a list of rows:
+  // reporter, started (of the session), at, running, volume, device, ringer.
+  ValueMap running;
   std::string problem;  // empty on success
   bool isUnknownSession = false;
 
@@ -28,6 +31,8 @@ struct ReportData {
   static constexpr int kMostNames = 12;     // applications, devices
   static constexpr int kMostChannels = 12;  // histograms, and as many states
   static constexpr int kMostDays = 92;      // in the heat map
+  static constexpr int kMostRunning = 100;  // sessions that still run
+  static constexpr int kMostSaid = 10'000;  // messages of them
 };
 
 }  // namespace tonewerk
