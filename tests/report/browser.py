@@ -103,16 +103,21 @@ class Browser:
         elif method == "Network.requestWillBeSent":
             self.requests.append(parameters["request"]["url"])
 
-    def open(self, path, width=1200, height=900, dark=False, mobile=False):
+    def open(self, path, **options):
         """Loads a file and waits until its pictures are drawn."""
+        self.open_address(f"file://{path}", **options)
+
+    def open_address(self, address, width=1200, height=900, dark=False, mobile=False):
+        """Loads a page and waits until its pictures are drawn."""
         self.problems.clear()
         self.requests.clear()
         self.call("Emulation.setDeviceMetricsOverride", width=width, height=height, deviceScaleFactor=1, mobile=mobile)
         self.call("Emulation.setTouchEmulationEnabled", enabled=mobile, maxTouchPoints=2)
         self.call("Emulation.setEmulatedMedia", features=[{"name": "prefers-color-scheme", "value": "dark" if dark else "light"}])
-        self.call("Page.navigate", url=f"file://{path}")
+        self.call("Page.navigate", url=address)
         deadline = time.monotonic() + PATIENCE
-        while not self.evaluate("location.protocol === 'file:' && document.readyState === 'complete'"):
+        scheme = address.split("//", 1)[0]
+        while not self.evaluate(f"location.protocol === '{scheme}' && document.readyState === 'complete'"):
             if time.monotonic() > deadline:
                 raise TimeoutError("the page does not load")
 

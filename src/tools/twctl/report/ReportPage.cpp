@@ -30,10 +30,11 @@ std::string scriptJson(const ValueMap& data) {
 
 }  // namespace
 
-std::string reportPage(const ValueMap& data, std::string_view nonce) {
+std::string reportPage(const ValueMap& data, std::string_view nonce, PageConnections connections) {
   const std::string json = scriptJson(data);
-  const std::array<std::pair<std::string_view, std::string_view>, 5> parts{
-      {{"{{style}}", report_assets::style()},
+  const std::array<std::pair<std::string_view, std::string_view>, 6> parts{
+      {{"{{connections}}", connections == PageConnections::kOwnServer ? "'self'" : "'none'"},
+       {"{{style}}", report_assets::style()},
        {"{{data}}", json},
        {"{{charts}}", report_assets::charts()},
        {"{{script}}", report_assets::script()},

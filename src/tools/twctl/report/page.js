@@ -1,12 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
 //
 // Draws the page from the element #data. docs/report.md says what it shows. All names in the data come from programs on the
-// device, so they are only ever set as text.
+// device, so they are only ever set as text. The page of `twctl serve` has `live` in its data: it then also asks its server for what
+// runs now, and for newer data.
 "use strict";
 (() => {
   // Control characters, and those that turn the direction of writing and so could change how the text around a name reads.
   const UNPRINTABLE = /[\u0000-\u001f\u007f-\u009f\u061c\u200e\u200f\u2028\u2029\u202a-\u202e\u2066-\u2069]/g;
-  const data = JSON.parse(document.getElementById("data").textContent, (_, value) => (typeof value === "string" ? value.replace(UNPRINTABLE, "\ufffd") : value));
+  const parse = (text) => JSON.parse(text, (_, value) => (typeof value === "string" ? value.replace(UNPRINTABLE, "\ufffd") : value));
+  let data = parse(document.getElementById("data").textContent);
   const page = document.getElementById("page");
   const { plot, select } = charts;
 
@@ -92,7 +94,7 @@
       return el("li", {}, mark, shortened(text, MOST_LETTERS / 2));
     }));
 
-  const pictures = [];
+  let pictures = [];
   let pictureNumber = 0;
 
   // A picture with its title, what it shows in words, and its numbers as a table. draw(width) returns an SVG element.
@@ -132,16 +134,30 @@
       let inner = group;
       while (inner.children.length === 1 && inner.firstElementChild.tagName === "g") inner = inner.firstElementChild; // clipped marks
       [...inner.children].forEach((child, i) => {
-        for (const [name, value] of Object.entries(attributes(rows[index[i]]))) child.setAttribute(`data-${name}`, value);
+        for (const [name, value] of Object.entries(attributes(rows[index[i]]))) if (value !== undefined) child.setAttribute(`data-${name}`, value);
       });
       return group;
     },
   });
 
-  // ---- Colours: a device has the same one in every picture
+  // ---- What the data say at once
 
-  const played = rowsOf(data.playing.byDevice.top);
-  const colours = new Map(played.slice(0, 7).map(({ name }, i) => [named(name), `var(--c${i + 1})`]));
+  let played, totals, session, overloaded, isEmpty;
+  const colours = new Map(); // a device has the same colour in every picture, and keeps it
+  const MOST_COLOURS = 7;
+  function colour(name) {
+    if (colours.size < MOST_COLOURS && !colours.has(name)) colours.set(name, `var(--c${colours.size + 1})`);
+  }
+  function derive() {
+    played = rowsOf(data.playing.byDevice.top);
+    for (const { name } of played) colour(named(name));
+    totals = data.totals;
+    session = data.session;
+    overloaded = rowsOf(data.issues.byBuffer);
+    isEmpty = totals.sessions === 0 && totals.playSeconds === 0 && totals.overloads + totals.otherIssues + totals.hapticsEvents === 0;
+  }
+  derive();
+
   const colourOf = (device) => colours.get(named(device)) ?? "var(--c8)";
   function deviceLegend(rows) {
     const used = new Set(rows.map(({ device }) => named(device)));
@@ -152,11 +168,6 @@
 
   // ---- The beginning: which device, which time, what matters
 
-  const totals = data.totals;
-  const session = data.session;
-  const overloaded = rowsOf(data.issues.byBuffer);
-  const isEmpty = totals.sessions === 0 && totals.playSeconds === 0 && totals.overloads + totals.otherIssues + totals.hapticsEvents === 0;
-
   function heading() {
     const device = data.device?.name ? `${data.device.name} (${data.device.host})` : data.device?.host || "this device";
     const title = session ? `Audio session #${session.id} on ${device}` : `Audio report of ${device}`;
@@ -164,7 +175,7 @@
     const filter = data.filter ?? {};
     const limits = filter.application ? `Only applications that fit “${filter.application}”. ` : "";
     const time = isEmpty ? "" : `${between(data.from, data.until)}, by the device's clock (${data.zone || "UTC"}). `;
-    return el("header", {}, el("h1", {}, title), el("p", { class: "quiet" }, `${time}${limits}Made on ${atMinute(data.generated)}.`));
+    return el("header", {}, el("h1", {}, title), el("p", { class: "quiet" }, `${time}${limits}${data.live ? "" : `Made on ${atMinute(data.generated)}.`}`));
   }
 
   // What a reader must know, in whole sentences.
@@ -179,7 +190,7 @@
       if (session) said.push(`It played ${time}, ${shareOf(device)} on ${named(device.name)}.`);
       else said.push(`The device played ${time}, ${shareOf(application)} for ${named(application.name)} and ${shareOf(device)} on ${named(device.name)}.`);
     } else {
-      said.push("Nothing was played.");
+      said.push(data.live ? "The store has no playing time yet." : "Nothing was played.");
     }
     if (totals.overloads > 0) {
       const worst = [...overloaded].sort((a, b) => b.count - a.count)[0];
@@ -231,6 +242,35 @@
     return el("ul", { class: "numbers" }, ...tiles);
   }
 
+  // ---- What runs now
+
+  // The newest state of `twctl serve`, and when it came by the browser's clock; null before the first, and on a page that is not live.
+  let state = null;
+  const SAME_START = 3; // seconds: the daemon and the store date a session's start a little differently
+  const nowAt = () => (state ? state.now + (performance.now() - state.came) / 1000 : data.generated);
+  // Up to here the stretches grow. What happens while the daemon does not answer, nobody knows.
+  const grownUntil = () => (state.answers ? nowAt() : state.lost);
+
+  // The sessions that run, or that ended a moment ago, with their stretches, as rows of the timeline.
+  function running() {
+    const sessions = [];
+    const stretches = [];
+    if (!state) return { sessions, stretches };
+    const stored = rowsOf(data.timeline.lanes);
+    for (const one of state.sessions) {
+      const row = stored.find(({ reporter, started }) => reporter === one.reporter && started !== null && Math.abs(started - one.started) < SAME_START);
+      if (row && row.ended !== null) continue; // the store has all of it
+      if (session && (!row || row.id !== session.id)) continue;
+      const id = row ? row.id : `now-${one.reporter}-${Math.round(one.started)}`;
+      const own = one.stretches.map(([started, ended, volume, device, ringer]) => ({ session: id, started, ended: ended ?? Math.max(started, grownUntil()), volume, device, ringer, isOpen: ended === null }));
+      for (const { device } of own) colour(named(device));
+      stretches.push(...own);
+      sessions.push({ ...row, id, service: one.service, application: one.application, process: one.processName, started: row ? row.started : one.started, ended: one.ended,
+        ending: null, overloads: row ? row.overloads : 0, playSeconds: sum(own, (stretch) => stretch.ended - stretch.started), runs: true });
+    }
+    return { sessions, stretches };
+  }
+
   // ---- The timeline
 
   // The heights of a lane's parts, in pixels. On paper they are smaller, so that the timeline fits below the numbers.
@@ -240,12 +280,16 @@
   const MOST_LANES = 24;
   const MOST_LANES_OF_APPLICATION = 4;
 
+  // A session that the store does not have yet has no number.
+  const nameOfSession = (one) => `${named(one?.application)}${typeof one?.id === "number" ? ` #${one.id}` : ""}`;
+
   // The lanes with their sessions: one a session, or one an application, and more for its sessions at the same time.
   function lanesOf(sessions, mode) {
     if (mode === "session") {
-      const longest = [...sessions].sort((a, b) => b.playSeconds + b.overloads - a.playSeconds - a.overloads).slice(0, MOST_LANES);
+      const weight = (one) => (one.runs ? 1e12 : 0) + one.playSeconds + one.overloads;
+      const longest = [...sessions].sort((a, b) => weight(b) - weight(a)).slice(0, MOST_LANES);
       return longest.sort((a, b) => a.started - b.started).map((one) => ({
-        label: `${named(one.application)} #${one.id}${one.overloads ? `, ${many(one.overloads, "overload", "overloads")}` : ""}`, sessions: [one] }));
+        label: `${nameOfSession(one)}${one.overloads ? `, ${many(one.overloads, "overload", "overloads")}` : ""}`, sessions: [one] }));
     }
     const lanes = [];
     for (const one of [...sessions].sort((a, b) => a.started - b.started)) {
@@ -256,10 +300,10 @@
       const lane = free ?? { application, sessions: [], seconds: 0 };
       if (!free) lanes.push(lane);
       lane.sessions.push(one);
-      lane.until = one.ended ?? data.until;
+      lane.until = one.ended ?? Math.max(data.until, nowAt());
     }
     const seconds = new Map();
-    for (const lane of lanes) seconds.set(lane.application, (seconds.get(lane.application) ?? 0) + sum(lane.sessions, (one) => one.playSeconds) + 1);
+    for (const lane of lanes) seconds.set(lane.application, (seconds.get(lane.application) ?? 0) + sum(lane.sessions, (one) => one.playSeconds + (one.runs ? 1e12 : 0)) + 1);
     lanes.sort((a, b) => seconds.get(b.application) - seconds.get(a.application) || (a.application < b.application ? -1 : a.application > b.application ? 1 : 0));
     const before = new Map();
     for (const lane of lanes) {
@@ -271,26 +315,47 @@
   }
 
   function timeline() {
-    const sessions = rowsOf(data.timeline.lanes).filter(({ started }) => started !== null);
-    const stretches = rowsOf(data.timeline.played).map((row) => ({ ...row, ended: row.ended ?? row.started }));
-    const inputs = rowsOf(data.timeline.heard).map((row) => ({ ...row, ended: row.ended ?? row.started }));
-    const issues = rowsOf(data.timeline.issues);
-    const haptics = rowsOf(data.timeline.haptics);
-    const hours = session || data.until - data.from < 4 * 3600 ? [] : data.hours.map(([from, seconds]) => ({ from, seconds }));
-    const title = session ? "The session over time" : "Sessions over time";
-    if (sessions.length === 0 && haptics.length === 0) {
-      return figure({ id: "timeline", title, emptyText: "No session was open in this time." });
+    const LEAST_SHOWN = 60; // seconds, of a live page
+    const LIVE_PAD = 5; // seconds: what comes would be an empty picture
+    let sessions, stretches, inputs, issues, haptics, hours, byId, all, pad;
+    function read() {
+      const now = running();
+      const runs = new Set(now.sessions.map(({ id }) => id));
+      sessions = [...rowsOf(data.timeline.lanes).filter(({ id, started }) => started !== null && !runs.has(id)), ...now.sessions];
+      stretches = [...rowsOf(data.timeline.played).filter((row) => !runs.has(row.session)).map((row) => ({ ...row, ended: row.ended ?? row.started })), ...now.stretches];
+      inputs = rowsOf(data.timeline.heard).map((row) => ({ ...row, ended: row.ended ?? row.started }));
+      issues = rowsOf(data.timeline.issues);
+      haptics = rowsOf(data.timeline.haptics);
+      hours = session || data.until - data.from < 4 * 3600 ? [] : data.hours.map(([from, seconds]) => ({ from, seconds }));
+      byId = new Map(sessions.map((one) => [one.id, one]));
+      const until = session && session.ended !== null ? data.until : Math.max(data.until, state ? nowAt() : 0);
+      const from = Math.min(data.from, ...now.sessions.map(({ started }) => started), state ? until - LEAST_SHOWN : data.from);
+      pad = Math.min(data.live ? LIVE_PAD : 1800, Math.max(1, (until - from) * 0.005));
+      all = [from - pad, until + pad];
     }
-    const byId = new Map(sessions.map((one) => [one.id, one]));
+    read();
+    const title = session ? "The session over time" : "Sessions over time";
+    const isNothing = () => sessions.length === 0 && haptics.length === 0;
+    if (isNothing()) {
+      const made = figure({ id: "timeline", title, emptyText: "No session was open in this time." });
+      made.update = () => {
+        read();
+        return isNothing();
+      };
+      return made;
+    }
     let mode = session || sessions.length <= 12 ? "session" : "application";
-    const pad = Math.min(1800, Math.max(1, (data.until - data.from) * 0.005));
-    const all = [data.from - pad, data.until + pad];
     let shown = [0, 1]; // the visible part of `all`
+    const isWhole = () => shown[1] - shown[0] > 0.999;
+    const isAtEnd = () => data.live && shown[1] > 0.999;
+    // A live page begins with the last hour, so that one sees something move.
+    const FIRST_SHOWN = 3600;
+    if (data.live && all[1] - all[0] > 2 * FIRST_SHOWN) shown = [1 - (FIRST_SHOWN + pad) / (all[1] - all[0]), 1];
     let lanes = [];
     const margin = { left: 6, right: 10 };
 
     const columns = [
-      ["Session", (row) => `#${row.id}`], ["Application", (row) => named(row.application)], ["Service", (row) => named(row.service)],
+      ["Session", (row) => (typeof row.id === "number" ? `#${row.id}` : "runs")], ["Application", (row) => named(row.application)], ["Service", (row) => named(row.service)],
       ["Started", (row) => at(row.started)], ["Ended", (row) => (row.ended === null ? "still runs" : at(row.ended))],
       ["Ending", (row) => row.ending ?? ""], ["Played", (row) => duration(row.playSeconds), true], ["Overloads", (row) => count(row.overloads), true],
     ];
@@ -304,6 +369,7 @@
       const until = all[0] + shown[1] * span;
       const least = (until - from) / size * 1.5; // nothing is thinner than this, so that a short sound can be seen
       const inside = (started, ended) => ended >= from && started <= until;
+      const endOf = (row) => row.ended ?? Math.max(data.until, state ? grownUntil() : 0);
       lanes = lanesOf(sessions, mode);
       const top = hours.length ? LABEL + VOLUME + 8 : 0;
       const laneOf = new Map(lanes.flatMap((lane, i) => lane.sessions.map((one) => [one.id, i])));
@@ -316,7 +382,7 @@
       const x = (time) => local(time);
       const wide = (started, ended) => x(Math.max(ended, started + least));
 
-      const lives = sessions.filter((row) => hasLane(row) && inside(row.started, row.ended ?? data.until));
+      const lives = sessions.filter((row) => hasLane(row) && inside(row.started, endOf(row)));
       const runs = stretches.filter((row) => hasLane(row) && inside(row.started, row.ended));
       const rings = runs.filter((row) => row.ringer === 1);
       const hears = inputs.filter((row) => hasLane(row) && inside(row.started, row.ended));
@@ -325,7 +391,7 @@
       const others = marks.filter((row) => row.kind !== "overload");
       const felt = haptics.filter((row) => inside(row.at, row.at));
       const visible = hours.filter((row) => inside(row.from, row.from + 3600));
-      const nameOf = (row) => `${named(byId.get(row.session ?? row.id)?.application)} #${row.session ?? row.id}`;
+      const nameOf = (row) => nameOfSession(byId.get(row.session ?? row.id));
       // The line would hide the area of a stretch that is hardly wider.
       const isNarrow = (row) => (row.ended - row.started) / (until - from) * size < 3;
       // The step line of the volume: two points a stretch, and none between stretches that do not touch.
@@ -353,13 +419,13 @@
             y2: LABEL + VOLUME, fill: "var(--c8)", clip: true, title: (d) => `${atMinute(d.from)}: ${duration(d.seconds)} played in this hour` },
           (d) => ({ mark: "hour", from: d.from, seconds: d.seconds }))),
           charts.ruleY(lanes.map((_, i) => top + i * LANE), { stroke: "var(--line)" }),
-          charts.rect(lives, tagged(lives, { x1: (d) => x(d.started), x2: (d) => wide(d.started, d.ended ?? data.until), y1: (d) => baseOf(d.id), y2: (d) => baseOf(d.id) + 2,
+          charts.rect(lives, tagged(lives, { x1: (d) => x(d.started), x2: (d) => wide(d.started, endOf(d)), y1: (d) => baseOf(d.id), y2: (d) => baseOf(d.id) + 2,
             fill: "var(--quiet)", clip: true, title: (d) => `${nameOf(d)}, ${at(d.started)} to ${d.ended === null ? "now: it still runs" : at(d.ended)}` },
-          (d) => ({ mark: "session", session: d.id, started: d.started, ended: d.ended ?? data.until }))),
+          (d) => ({ mark: "session", session: d.id, started: d.started, ended: endOf(d) }))),
           charts.rect(runs, tagged(runs, { x1: (d) => x(d.started), x2: (d) => x(d.ended), y1: (d) => heightOf(d.session, d.volume), y2: (d) => baseOf(d.session),
             fill: (d) => colourOf(d.device), fillOpacity: (d) => (isNarrow(d) ? 0.9 : 0.3), clip: true,
             title: (d) => `${nameOf(d)}: ${named(d.device)} at ${percent(d.volume) || "unknown volume"}, ${duration(d.ended - d.started)} from ${at(d.started)}` },
-          (d) => ({ mark: "stretch", session: d.session, started: d.started, ended: d.ended, volume: d.volume }))),
+          (d) => ({ mark: "stretch", session: d.session, started: d.started, ended: d.ended, volume: d.volume, open: d.isOpen ? "yes" : undefined }))),
           charts.line(steps, { x: (d) => x(d.time), y: (d) => (d.volume === null ? NaN : heightOf(d.session, d.volume)), z: "session", stroke: "var(--ink)", strokeWidth: 1.25, clip: true }),
           charts.rect(runs, tagged(runs, { x1: (d) => x(d.started), x2: (d) => wide(d.started, d.ended), y1: (d) => topOf(d.session), y2: (d) => topOf(d.session) + BAND,
             fill: (d) => colourOf(d.device), clip: true }, (d) => ({ mark: "device", device: named(d.device) }))),
@@ -383,11 +449,12 @@
       return svg;
     }
 
+    const legendNow = () => [...deviceLegend(stretches), ["volume", "var(--ink)", "thin"], ["ringer on", "var(--bell)", "thin"], ["input", "var(--input)", "thin"], ["overload", "var(--bad)", "tick"],
+      ...(issues.some(({ kind }) => kind !== "overload") ? [["other issue (diamond)", "var(--ink)", "tick"]] : []), ...(haptics.length ? [["haptics", "var(--c4)", "tick"]] : [])];
     const made = figure({
       id: "timeline", title, columns, rows: sessions, draw,
       about: `The band on top of a lane is the device, the line and the area under it the volume from silent to full. A grey line lasts as long as the session is open.`,
-      legendOf: [...deviceLegend(stretches), ["volume", "var(--ink)", "thin"], ["ringer on", "var(--bell)", "thin"], ["input", "var(--input)", "thin"], ["overload", "var(--bad)", "tick"],
-        ...(issues.some(({ kind }) => kind !== "overload") ? [["other issue (diamond)", "var(--ink)", "tick"]] : []), ...(haptics.length ? [["haptics", "var(--c4)", "tick"]] : [])],
+      legendOf: legendNow(),
     });
     const picture = pictures[pictures.length - 1];
     const box = picture.box;
@@ -401,11 +468,15 @@
     const zoom = charts.zoom().scaleExtent([1, 20000]);
     const target = select(box);
     let waits = false;
+    let isMoved = false; // by a hand or a wheel, at this moment
     const inner = () => Math.max(50, (picture.width ?? 600) - margin.left - margin.right);
     const describe = () => {
       const span = all[1] - all[0];
-      says.classList.toggle("hint", shown[1] - shown[0] > 0.999);
-      says.textContent = shown[1] - shown[0] > 0.999 ? "Shows everything." : `Shows ${between(all[0] + shown[0] * span, all[0] + shown[1] * span)}.`;
+      says.classList.toggle("hint", isWhole());
+      let text = `Shows ${between(all[0] + shown[0] * span, all[0] + shown[1] * span)}.`;
+      if (isAtEnd()) text = `Shows the last ${duration((shown[1] - shown[0]) * span)}, and what comes.`;
+      if (isWhole()) text = "Shows everything.";
+      if (says.textContent !== text) says.textContent = text; // a screen reader reads it again when it is set
     };
     const setTransform = () => {
       const scale = 1 / (shown[1] - shown[0]);
@@ -421,6 +492,8 @@
       return redraw(picture.width);
     };
     zoom.filter((event) => (event.type === "wheel" ? event.ctrlKey || event.metaKey || document.activeElement === box : !event.button));
+    zoom.on("start", () => { isMoved = true; });
+    zoom.on("end", () => { isMoved = false; });
     zoom.on("zoom", ({ transform }) => {
       const places = [margin.left, margin.left + inner()].map((place) => (transform.invertX(place) - margin.left) / inner());
       shown = [Math.max(0, places[0]), Math.min(1, places[1])];
@@ -454,9 +527,10 @@
     };
     const tools = el("div", { class: "tools" }, button("+", "Zoom in", () => by(1.6)), button("−", "Zoom out", () => by(1 / 1.6)),
       button("◀", "Earlier", () => move(-0.5)), button("▶", "Later", () => move(0.5)), button("All", "Show everything", () => show(0, 1)));
-    const span = all[1] - all[0];
-    if (span > 2 * 86400) tools.append(button("Last day", "Show the last day", () => show(1 - (86400 + pad) / span, 1)));
-    if (!session && sessions.length > 1) {
+    const showLast = (seconds) => show(1 - (seconds + pad) / (all[1] - all[0]), 1);
+    if (data.live) tools.append(button("Last minute", "Show the last minute, and what comes", () => showLast(60)), button("Last hour", "Show the last hour, and what comes", () => showLast(3600)));
+    if (all[1] - all[0] > 2 * 86400) tools.append(button("Last day", "Show the last day", () => showLast(86400)));
+    if (!session && (sessions.length > 1 || data.live)) {
       const choice = el("select", { id: "lanes" }, el("option", { value: "application" }, "application"), el("option", { value: "session" }, "session"));
       choice.value = mode;
       choice.addEventListener("change", () => {
@@ -478,10 +552,40 @@
       if (out.stretches > 0) missing.push(`${many(out.stretches, "short stretch", "short stretches")}`);
       if (out.issues > 0) missing.push(`${many(out.issues, "short issue", "short issues")}`);
       if (out.haptics > 0) missing.push(`${many(out.haptics, "short haptic event", "short haptic events")}`);
-      left.textContent = missing.length ? `Left out of the lanes: ${missing.join(", ")}. All other numbers on the page count them.` : "";
+      const text = missing.length ? `Left out of the lanes: ${missing.join(", ")}. All other numbers on the page count them.` : "";
+      if (left.textContent !== text) left.textContent = text;
     };
     note();
     box.after(left);
+    // Takes newer data, or shows that time has passed. What is visible stays, or stays at the end. False when the timeline must be made anew.
+    made.update = () => {
+      const before = all;
+      const wasWhole = isWhole();
+      const move = isAtEnd();
+      read();
+      if (isNothing()) return false;
+      const span = all[1] - all[0];
+      if (!wasWhole) {
+        const moved = move ? all[1] - (before[0] + shown[1] * (before[1] - before[0])) : 0;
+        shown = shown.map((part) => Math.min(1, Math.max(0, (before[0] + part * (before[1] - before[0]) + moved - all[0]) / span)));
+      }
+      const fresh = legend(legendNow());
+      const old = made.querySelector(".legend");
+      if (!fresh.isEqualNode(old)) old.replaceWith(fresh);
+      const details = made.querySelector("details");
+      const rows = table(columns, sessions);
+      if (!rows.isEqualNode(details.lastElementChild)) {
+        const places = placesIn([details]);
+        details.lastElementChild.replaceWith(rows);
+        restore([details], places);
+      }
+      note();
+      if (isMoved || waits || picture.width === undefined) return true;
+      setTransform();
+      describe();
+      redraw(picture.width);
+      return true;
+    };
     box.after(el("p", { class: "quiet hint" }, "Zoom: the wheel after a click or with Ctrl, two fingers, or + and −. Move: drag, or the arrow keys."));
     return made;
   }
@@ -740,29 +844,202 @@
     ];
   }
 
-  function build() {
-    const parts = [heading(), el("ul", { class: "findings" }, ...findings().map((text) => el("li", {}, text))), numbers()];
-    if (session) {
-      parts.push(el("h2", {}, "Timeline"), timeline(), ...sessionTables());
-      if (totals.overloads > 0) parts.push(el("h2", {}, "Overloads"), overloadsByBuffer());
-    } else {
-      parts.push(el("h2", {}, "Timeline"), timeline(), heatMap(), el("h2", {}, "Where the time went"), byApplication(),
-        el("div", { class: "pair" }, byDevice(), byVolume()), el("h2", {}, "Overloads"), el("div", { class: "pair" }, overloadsOverTime(), overloadsByBuffer()));
+  // ---- The page and its parts
+
+  // What readers have done with these elements: tables that they opened, how far they scrolled in them, and the focus.
+  const REMEMBERED = "details, .scroll, summary, button, select, [tabindex]";
+  function placesOf(nodes) {
+    const found = new Map();
+    for (const node of nodes) {
+      for (const element of [node, ...node.querySelectorAll("*")].filter((one) => one.matches(REMEMBERED))) {
+        const of = element.closest("figure")?.querySelector("h3")?.textContent ?? "";
+        let number = 0;
+        while (found.has(`${of}/${element.tagName}/${number}`)) ++number;
+        found.set(`${of}/${element.tagName}/${number}`, element);
+      }
     }
-    parts.push(el("h2", {}, "Drivers"), ...drivers());
-    if (!session) parts.push(el("h2", {}, "Haptics and formats"), otherTables());
-    if (data.daemon) parts.push(el("h2", {}, "The daemon's own health"), ...health());
-    parts.push(el("footer", {}, el("p", {}, `Made by twctl ${data.version ?? ""} from the device's report store. The page needs no network and sends nothing. Pictures: Observable Plot and d3, whose licences are in this file.`)));
-    page.replaceChildren(...parts);
+    return found;
+  }
+  const placesIn = (nodes) => [...placesOf(nodes)].map(([name, element]) => ({ name, open: element.open, top: element.scrollTop, left: element.scrollLeft, hasFocus: element === document.activeElement }));
+  function restore(nodes, places) {
+    const elements = placesOf(nodes);
+    for (const { name, open, top, left, hasFocus } of places) {
+      const element = elements.get(name);
+      if (!element) continue;
+      if (open) element.open = true;
+      if (top || left) element.scrollTo({ top, left, behavior: "instant" });
+      if (hasFocus) element.focus({ preventScroll: true });
+    }
+  }
+
+  const section = (text) => () => [el("h2", {}, text)];
+  // The parts of the page, in their order. Each function makes its elements anew.
+  function partsNow() {
+    const beginning = [() => [heading()], ...(data.live ? [liveMark] : []), () => [el("ul", { class: "findings" }, ...findings().map((text) => el("li", {}, text)))], () => [numbers()], section("Timeline"), timelinePart];
+    const middle = session
+      ? [sessionTables, ...(totals.overloads > 0 ? [section("Overloads"), () => [overloadsByBuffer()]] : [])]
+      : [() => [heatMap()], section("Where the time went"), () => [byApplication()], () => [el("div", { class: "pair" }, byDevice(), byVolume())],
+        section("Overloads"), () => [el("div", { class: "pair" }, overloadsOverTime(), overloadsByBuffer())]];
+    return [...beginning, ...middle, section("Drivers"), drivers, ...(session ? [] : [section("Haptics and formats"), () => [otherTables()]]),
+      ...(data.daemon ? [section("The daemon's own health"), health] : []), () => [footer()]];
+  }
+  const footer = () => el("footer", {}, el("p", {}, data.live
+    ? `Served by twctl ${data.version ?? ""} from the device's report store and its daemon. The page asks no other server, and changes nothing. Pictures: Observable Plot and d3, whose licences are in this page.`
+    : `Made by twctl ${data.version ?? ""} from the device's report store. The page needs no network and sends nothing. Pictures: Observable Plot and d3, whose licences are in this file.`));
+
+  let timelineFigure = null;
+  function timelinePart() {
+    timelineFigure = timeline();
+    return [timelineFigure];
+  }
+
+  // Each has its elements, and their text before pictures were drawn, by which a change is noticed.
+  let parts = [];
+  const textOf = (nodes) => nodes.map((node) => node.outerHTML).join("\n");
+  function build() {
+    pictures = [];
+    parts = partsNow().map((make) => {
+      const nodes = make();
+      return { nodes, text: textOf(nodes) };
+    });
+    page.replaceChildren(...parts.flatMap(({ nodes }) => nodes));
+  }
+  const draw = (picture, width) => picture.redraw(Math.max(240, Math.floor(width ?? picture.box.parentElement.clientWidth)));
+
+  // Takes newer data. Only what they change is made anew; the timeline keeps its zoom.
+  function update(next) {
+    data = next;
+    derive();
+    const scrolled = [scrollX, scrollY];
+    const makers = partsNow();
+    if (makers.length !== parts.length) {
+      const places = placesIn([page]);
+      build();
+      redrawAll();
+      restore([page], places);
+    } else {
+      makers.forEach((make, i) => {
+        if (make === liveMark || (make === timelinePart && timelineFigure.update())) return;
+        const before = pictures.length;
+        const nodes = make();
+        const text = textOf(nodes);
+        if (text === parts[i].text) {
+          pictures.length = before;
+          return;
+        }
+        // The new elements are drawn before the old ones go, so that the page never becomes shorter than the place that is read.
+        const places = placesIn(parts[i].nodes);
+        const old = parts[i].nodes;
+        old[0].before(...nodes);
+        pictures.slice(before).forEach((picture) => draw(picture));
+        old.forEach((node) => node.remove());
+        parts[i] = { nodes, text };
+        restore(nodes, places);
+      });
+      pictures = pictures.filter(({ box }) => box.isConnected);
+    }
+    scrollTo({ left: scrolled[0], top: scrolled[1], behavior: "instant" });
   }
 
   let drawnFor = 0;
   function redrawAll(width) {
-    for (const picture of pictures) picture.redraw(Math.max(240, Math.floor(width ?? picture.box.parentElement.clientWidth)));
+    for (const picture of pictures) draw(picture, width);
   }
+
+  // ---- Live
+
+  const NO_SERVER = "twctl serve does not answer; trying again.";
+  const SHUT = "twctl serve refuses this page. If it was started again, open the address that it has printed.";
+  const NOT_YET = "Asking twctl serve what runs.";
+  const liveSays = el("p", { class: "live-says", role: "status", "aria-live": "polite" }, NOT_YET);
+  const liveTime = el("p", { class: "quiet live-time" });
+  const nowList = el("ul", { class: "now", "aria-label": "What plays now" });
+  const liveBox = el("section", { id: "live", "aria-label": "Live" }, liveSays, liveTime, nowList);
+  const liveMark = () => [liveBox];
+  let serverProblem = NOT_YET;
+  let changed = null;
+
+  // Only a change of the connection is read aloud.
+  function showState() {
+    const text = serverProblem || state.problem || state.storeProblem || "Live: the daemon answers.";
+    if (liveSays.textContent !== text) liveSays.textContent = text;
+    liveBox.classList.toggle("lost", Boolean(serverProblem || state?.problem));
+    if (!state) return;
+    const missed = state.missed > 0 ? ` ${many(state.missed, "message was", "messages were")} missed.` : "";
+    const leftOut = state.leftOut > 0 ? ` ${many(state.leftOut, "more session runs", "more sessions run")}.` : "";
+    const time = `Last change: ${at(changed)}.${missed}${leftOut}`;
+    if (liveTime.textContent !== time) liveTime.textContent = time;
+    const { sessions, stretches } = running();
+    const open = stretches.filter(({ isOpen }) => isOpen && state.answers && !serverProblem);
+    const texts = open.map((row) => `${nameOfSession(sessions.find(({ id }) => id === row.session))}: ${named(row.device)} at ${percent(row.volume) || "unknown volume"}, for ${duration(Math.max(1, Math.round(row.ended - row.started)))}`);
+    if (texts.length === 0) texts.push(state.answers && !serverProblem ? "Nothing plays now." : "What plays now is not known.");
+    while (nowList.children.length > texts.length) nowList.lastElementChild.remove();
+    texts.forEach((line, i) => {
+      if (!nowList.children[i]) nowList.append(el("li"));
+      if (nowList.children[i].textContent !== line) nowList.children[i].textContent = line;
+    });
+  }
+
+  // A picture with many marks takes its time. It gets at most a part of the processor's.
+  let drawAgain = 0;
+  function showTime(isNews) {
+    showState();
+    if (document.hidden || (!isNews && performance.now() < drawAgain)) return;
+    const begin = performance.now();
+    if (!timelineFigure.update()) {
+      const next = timeline();
+      timelineFigure.replaceWith(next);
+      parts.find(({ nodes }) => nodes[0] === timelineFigure).nodes = [next];
+      timelineFigure = next;
+      pictures = pictures.filter(({ box }) => box.isConnected);
+      pictures.filter(({ box }) => next.contains(box)).forEach((picture) => draw(picture));
+    }
+    drawAgain = begin + Math.max(900, 8 * (performance.now() - begin));
+  }
+
+  let asks = false;
+  async function takeStored(address) {
+    if (asks) return;
+    asks = true;
+    try {
+      const answer = await fetch(address, { cache: "no-store" });
+      if (answer.ok) update(parse(await answer.text()));
+    } catch {
+      // The next state asks again.
+    }
+    asks = false;
+    showTime(true);
+  }
+
+  function goLive() {
+    const token = encodeURIComponent(new URLSearchParams(location.search).get("token") ?? "");
+    const source = new EventSource(`live?token=${token}`);
+    source.addEventListener("message", (event) => {
+      const before = state;
+      state = parse(event.data);
+      state.came = performance.now();
+      state.lost = state.answers ? null : before?.lost ?? state.now;
+      serverProblem = "";
+      changed = state.now;
+      showTime(true);
+      if (state.stored !== data.live.stored) takeStored(`data?token=${token}`);
+    });
+    source.addEventListener("error", () => {
+      serverProblem = source.readyState === EventSource.CLOSED ? SHUT : NO_SERVER;
+      if (state && state.answers) state = { ...state, answers: false, lost: nowAt() };
+      showState();
+    });
+    setInterval(() => {
+      showTime(false);
+      if (state && state.stored !== data.live.stored) takeStored(`data?token=${token}`);
+    }, 1000);
+    document.addEventListener("visibilitychange", () => showTime(true));
+  }
+
   build();
   redrawAll();
   drawnFor = document.documentElement.clientWidth;
+  if (data.live) goLive();
   let resizing = 0;
   addEventListener("resize", () => {
     cancelAnimationFrame(resizing);
