@@ -44,6 +44,7 @@ int runCommandLine(int argc, const char* const* argv, Tool& tool) {
   addSessionCommands(app, tool);
   addTraceCommand(app, tool);
   addReportCommand(app, tool);
+  addServeCommand(app, tool);
   addSqlCommand(app, tool);
   addExportCommand(app, tool);
   addDefaultsCommand(app, tool);

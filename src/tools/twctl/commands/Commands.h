@@ -32,6 +32,7 @@ void addSessionsCommand(CLI::App& app, Tool& tool);
 void addSessionCommands(CLI::App& app, Tool& tool);
 void addTraceCommand(CLI::App& app, Tool& tool);
 void addReportCommand(CLI::App& app, Tool& tool);
+void addServeCommand(CLI::App& app, Tool& tool);
 void addSqlCommand(CLI::App& app, Tool& tool);
 void addExportCommand(CLI::App& app, Tool& tool);
 void addDefaultsCommand(CLI::App& app, Tool& tool);
