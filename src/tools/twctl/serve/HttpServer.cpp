@@ -4,7 +4,6 @@
 #include <algorithm>
 #include <array>
 #include <cerrno>
-#include <cstring>
 #include <fcntl.h>
 #include <microhttpd.h>
 #include <netinet/in.h>
@@ -46,7 +45,7 @@ ssize_t readPart(void* context, std::uint64_t /*position*/, char* buffer, std::s
   }
   if (reader.part.empty()) return MHD_CONTENT_READER_END_OF_STREAM;
   const std::size_t count = std::min(most, reader.part.size() - reader.sent);
-  std::memcpy(buffer, reader.part.data() + reader.sent, count);
+  reader.part.copy(buffer, count, reader.sent);
   reader.sent += count;
   return static_cast<ssize_t>(count);
 }
@@ -58,7 +57,7 @@ ssize_t readWhole(void* context, std::uint64_t position, char* buffer, std::size
   const std::string& text = **static_cast<std::shared_ptr<const std::string>*>(context);
   const std::size_t count = std::min<std::size_t>(most, text.size() - position);
   if (count == 0) return MHD_CONTENT_READER_END_OF_STREAM;
-  std::memcpy(buffer, text.data() + position, count);
+  text.copy(buffer, count, position);
   return static_cast<ssize_t>(count);
 }
 

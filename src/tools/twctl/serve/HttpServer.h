@@ -34,7 +34,7 @@ struct PageAnswer {
 class HttpServer {
  public:
   static constexpr unsigned int kMostConnections = 32;
-  static constexpr std::size_t kMostRequestBytes = 32 * 1024;
+  static constexpr std::size_t kMostRequestBytes = std::size_t{32} * 1024;
   static constexpr unsigned int kSilenceSeconds = 30;
 
   // Runs on the connections' threads, several at a time.

@@ -13,7 +13,8 @@
 
 namespace tonewerk {
 
-// Keeps what the store says, and reads it again on a thread of its own when the store has changed. Any thread.
+// Keeps what the store says, and reads it again on a thread of its own when the store has changed. Any
+// thread.
 class StoredReport {
  public:
   // One state of the store.

@@ -263,5 +263,22 @@ TEST_F(ReportDataTest, NamesTheFileAndWhatItLacks) {
   EXPECT_THAT(ReportData::read(empty.path(), {}, kNow).problem, HasSubstr("there is no such file"));
 }
 
+TEST_F(ReportDataTest, SaysOnDemandWhatSessionsThatStillRunHaveSaidOfPlayback) {
+  views_.played(1, "Melody", kDay, 60.0, "Speaker", 0.5);
+  views_.played(2, "Phone", kDay + 100.0, 60.0, "Earpiece", 0.5);
+  views_.run(
+      "UPDATE session SET ended_at = NULL, ending = NULL WHERE id = 2;"
+      "INSERT INTO event VALUES (1, 5, 1, '', '', 'client', '{\"QMSessionVolume\":1}'),"
+      "(2, 6, 2, '', '', 'client', '{\"QMSessionVolume\":0.25,\"active_devices\":\"Car\"}'),"
+      "(3, 7, 2, '', '', 'client', '{\"session_output_running\":true,\"twreporting_timestamp\":6.5}'),"
+      "(4, 8, 2, '', '', 'client', '{\"io_cycle\":3}'), (5, 9, 2, '', '', 'derived', "
+      "'{\"QMSessionVolume\":1}')");
+  ReportScope scope;
+  EXPECT_TRUE(ReportData::read(directory_.path(), scope, kNow).running.empty());
+  scope.hasRunning = true;
+  EXPECT_EQ(ReportData::read(directory_.path(), scope, kNow).running.text("rows"),
+            "[[1002,1795132900.0,6.5,1,null,null,null],[1002,1795132900.0,6.0,null,0.25,\"Car\",null]]");
+}
+
 }  // namespace
 }  // namespace tonewerk
