@@ -113,9 +113,11 @@ class LivePageTest(unittest.TestCase):
         self.wait_for_text("Desk at 50 %")
         self.machine.stop(daemon, signal.SIGKILL)  # which cannot end its sessions any more
         self.wait_for_text("The daemon does not answer; trying again")
+        self.wait_for_text("No daemon answered when this page was made")
         frozen = self.wait_for_stretch("a stretch that does not grow", lambda one: one["volume"] == 0.5)
         self.machine.start_daemon()
         self.wait_for_text("Live: the daemon answers.")
+        self.wait_for_text("Since it began it dropped and refused nothing.")
         self.assertLessEqual(next((one["ended"] for one in self.stretches() if one["volume"] == 0.5), 0.0), frozen["ended"] + 0.01)
         self.assertEqual(self.browser.problems, [])
 

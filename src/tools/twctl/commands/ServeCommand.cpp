@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <CLI/CLI.hpp>
 #include <algorithm>
+#include <atomic>
 #include <chrono>
 #include <cstdint>
 #include <fnmatch.h>
@@ -60,7 +61,9 @@ std::string stampOf(const std::string& directory) {
   return stamp;
 }
 
-StoredReport::Source sourceOf(Tool& tool, const ServeOptions& options, const ValueMap& device) {
+// `turns`: how often the daemon went or came back. A reading asks it how it does.
+StoredReport::Source sourceOf(Tool& tool, const ServeOptions& options, const ValueMap& device,
+                              const std::atomic<std::uint64_t>& turns) {
   const auto read = [&tool, &options, device] {
     std::optional<ReportScope> scope = options.scope.scope(tool);  // again, because a span ends now
     scope->hasRunning = true;
@@ -71,7 +74,7 @@ StoredReport::Source sourceOf(Tool& tool, const ServeOptions& options, const Val
     reading.problem = std::move(report.problem);
     return reading;
   };
-  return {read, [&tool] { return stampOf(tool.directories().state); }};
+  return {read, [&tool, &turns] { return stampOf(tool.directories().state) + std::to_string(turns); }};
 }
 
 // Sends the page what has changed.
@@ -118,13 +121,13 @@ class StateSender {
   steady_clock::time_point sentAt_;
 };
 
-void follow(const Tool& tool, const ReportScope& scope, StoredReport& stored, LiveFeed& feed) {
-  LiveEvents events(-1, -1);
-  DaemonWatch daemon(tool.socketPaths());
-  StateSender sender(feed, scope);
+void follow(DaemonWatch& daemon, StateSender& sender, StoredReport& stored, LiveFeed& feed,
+            LiveEvents& events, std::atomic<std::uint64_t>& turns) {
   std::pair<std::uint64_t, std::uint64_t> remembered;
   for (;;) {
+    const bool answered = daemon.answers();
     daemon.proceed(steady_clock::now(), secondsSince1970());
+    if (daemon.answers() != answered) ++turns;
     // Nobody reads the page, so nobody needs the store's news.
     if (feed.readers() > 0) stored.refresh();
     const std::shared_ptr<const StoredReport::Reading> newest = stored.newest();
@@ -140,12 +143,14 @@ void follow(const Tool& tool, const ReportScope& scope, StoredReport& stored, Li
 int serve(Tool& tool, const ServeOptions& options) {
   const std::optional<ReportScope> scope = options.scope.scope(tool);
   if (!scope) return tool.status;
-  StoredReport stored(sourceOf(tool, options, reportedDevice(tool)));
+  std::atomic<std::uint64_t> turns = 0;
+  StoredReport stored(sourceOf(tool, options, reportedDevice(tool), turns));
   std::string problem = stored.readFirst();
   if (!problem.empty()) return tool.fail(kRefused, problem);
   const std::optional<std::string> token = newServeToken();
   if (!token) return tool.fail(kRefused, "serve: the system has no random numbers");
 
+  LiveEvents events(-1, -1);  // before the address is printed, because a reader of it may send a signal
   LiveFeed feed;
   HttpServer server;
   problem = server.listen(options.port);
@@ -158,7 +163,11 @@ int serve(Tool& tool, const ServeOptions& options) {
 
   const std::string address = "http://127.0.0.1:" + std::to_string(server.port()) + "/?token=" + *token;
   tool.out << (tool.asJson ? "{\"address\":\"" + address + "\"}" : address) << '\n';
-  if (tool.out.flush()) follow(tool, *scope, stored, feed);
+  if (tool.out.flush()) {
+    DaemonWatch daemon(tool.socketPaths());
+    StateSender sender(feed, *scope);
+    follow(daemon, sender, stored, feed, events, turns);
+  }
   feed.end();
   server.stop();
   return kDone;
