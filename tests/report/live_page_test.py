@@ -106,6 +106,7 @@ class LivePageTest(unittest.TestCase):
         self.wait_for_text("The daemon does not answer; trying again")
         self.wait_for_text("What plays now is not known.")
         self.assertGreater(self.evaluate("document.querySelectorAll('.picture svg').length"), 4)
+        self.assertEqual(self.evaluate("document.querySelector('.shows').textContent"), "Shows everything.")  # because nothing happened in the last hour
         self.picture("no-daemon")
         daemon = self.machine.start_daemon()
         self.wait_for_text("Live: the daemon answers.")
@@ -164,6 +165,7 @@ class LivePageTest(unittest.TestCase):
                 self.open(address, width=width, dark=dark, mobile=width < 500)
                 self.wait_for_text("<b>Desk</b> at 40 %")
                 self.wait_for_stretch("the stretch", lambda one: one["open"])
+                self.assertEqual(self.evaluate("document.querySelector('.shows').textContent"), "Shows the last 1 h, and what comes.")
                 self.assertLessEqual(self.evaluate("document.documentElement.scrollWidth"), width)
                 self.picture(f"live-{width}-{'dark' if dark else 'light'}")
                 self.assertEqual(self.browser.problems, [])

@@ -134,7 +134,7 @@ void follow(DaemonWatch& daemon, StateSender& sender, StoredReport& stored, Live
     const std::pair state(newest->number, daemon.connections());
     if (state != remembered) daemon.remember(newest->running);
     remembered = state;
-    sender.send(daemon, *newest);
+    if (daemon.hasAsked()) sender.send(daemon, *newest);
     const auto next = std::min(daemon.nextStep(), steady_clock::now() + kTick);
     if (events.wait(daemon.fileDescriptor(), next) == LiveEvents::Event::kStopped) return;
   }

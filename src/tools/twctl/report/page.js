@@ -348,9 +348,13 @@
     let shown = [0, 1]; // the visible part of `all`
     const isWhole = () => shown[1] - shown[0] > 0.999;
     const isAtEnd = () => data.live && shown[1] > 0.999;
-    // A live page begins with the last hour, so that one sees something move.
+    // A live page begins with the last hour, so that one sees something move, unless the last thing that happened is longer ago.
     const FIRST_SHOWN = 3600;
-    if (data.live && all[1] - all[0] > 2 * FIRST_SHOWN) shown = [1 - (FIRST_SHOWN + pad) / (all[1] - all[0]), 1];
+    let hasBegun = false;
+    function begin() {
+      const isOld = !sessions.some(({ runs }) => runs) && all[1] - data.until > FIRST_SHOWN;
+      shown = all[1] - all[0] > 2 * FIRST_SHOWN && !isOld ? [1 - (FIRST_SHOWN + pad) / (all[1] - all[0]), 1] : [0, 1];
+    }
     let lanes = [];
     const margin = { left: 6, right: 10 };
 
@@ -565,7 +569,10 @@
       read();
       if (isNothing()) return false;
       const span = all[1] - all[0];
-      if (!wasWhole) {
+      if (state && !hasBegun) {
+        hasBegun = true;
+        begin();
+      } else if (!wasWhole) {
         const moved = move ? all[1] - (before[0] + shown[1] * (before[1] - before[0])) : 0;
         shown = shown.map((part) => Math.min(1, Math.max(0, (before[0] + part * (before[1] - before[0]) + moved - all[0]) / span)));
       }

@@ -39,6 +39,7 @@ void DaemonWatch::proceed(Time time, double now) {
   if (error) return fail(kNoAnswer, time);
   if (!askedAt_ || time < *askedAt_ + kPatience) return;
   // The connection stays: an answer that comes late is an answer.
+  hasAsked_ = true;
   problem_ = kNoAnswer;
   askedAt_ = time;
 }
@@ -112,12 +113,14 @@ void DaemonWatch::takeSessions(const Value& result) {
   listing_.clear();
   askedAt_.reset();
   dueAt_ = time_ + kListingPause;
+  hasAsked_ = true;
   problem_.clear();
 }
 
 void DaemonWatch::fail(std::string problem, Time time) {
   connection_.reset();
   askedAt_.reset();
+  hasAsked_ = true;
   problem_ = std::move(problem);
   dueAt_ = time + kRetryPause;
 }

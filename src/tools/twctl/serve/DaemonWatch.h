@@ -38,8 +38,10 @@ class DaemonWatch {
   // Does what is due. `now` is the time in seconds since 1970.
   void proceed(Time time, double now);
 
-  bool answers() const { return problem_.empty(); }
-  // What is wrong, in a sentence for people; empty when the daemon answers.
+  // False until it is known whether the daemon answers.
+  bool hasAsked() const { return hasAsked_; }
+  bool answers() const { return hasAsked_ && problem_.empty(); }
+  // What is wrong, in a sentence for people; empty when the daemon answers, and before it is known.
   const std::string& problem() const { return problem_; }
   const LiveSessions& sessions() const { return sessions_; }
   // Adds what the store has of the sessions that run, see LiveSessions::remember().
@@ -61,7 +63,8 @@ class DaemonWatch {
 
   const std::vector<std::string> paths_;
   LiveSessions sessions_;
-  std::string problem_ = "The daemon was not asked yet.";
+  bool hasAsked_ = false;
+  std::string problem_;
   std::int64_t missed_ = 0;
   Time time_;                    // of the current step
   double now_ = 0.0;             // likewise, in seconds since 1970

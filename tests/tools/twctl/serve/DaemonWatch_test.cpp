@@ -43,6 +43,8 @@ class DaemonWatchTest : public testing::Test {
 };
 
 TEST_F(DaemonWatchTest, SaysThatNoDaemonAnswersAndTriesAgainLater) {
+  EXPECT_FALSE(watch_.hasAsked());
+  EXPECT_FALSE(watch_.answers());
   watch_.proceed(time_, kNow);
   EXPECT_EQ(watch_.problem(), "The daemon does not answer; trying again.");
   EXPECT_EQ(watch_.nextStep(), time_ + DaemonWatch::kRetryPause);
@@ -78,7 +80,7 @@ TEST_F(DaemonWatchTest, AsksForThePortionsThatAreLeft) {
 TEST_F(DaemonWatchTest, SaysWhatTheDaemonRefuses) {
   ScriptedDaemon daemon(path_);
   daemon.refuse("watch.sessions", messagingError(kNotPermitted, "not permitted: only for trusted users"));
-  proceedUntil([&] { return !watch_.problem().starts_with("The daemon was not asked"); });
+  proceedUntil([&] { return watch_.hasAsked(); });
   EXPECT_THAT(watch_.problem(), HasSubstr("watch.sessions: not permitted: only for trusted users"));
   EXPECT_EQ(watch_.fileDescriptor(), -1);
   EXPECT_GT(watch_.nextStep(), time_ + DaemonWatch::kRetryPause);
@@ -89,6 +91,7 @@ TEST_F(DaemonWatchTest, KeepsWhatItKnowsWhenTheDaemonGoes) {
   daemon->answer("watch.sessions", listing(1, 7));
   proceedUntil([&] { return watch_.answers(); });
   daemon.reset();
+  EXPECT_EQ(watch_.problem(), "");
   proceedUntil([&] { return !watch_.answers(); });
   EXPECT_EQ(watch_.problem(), "The daemon does not answer; trying again.");
   EXPECT_EQ(sessions(), 1U);
