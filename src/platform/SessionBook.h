@@ -37,7 +37,7 @@ struct SessionLife {
 
 enum class SessionEnding {
   kStopped,       // by its client, or for want of use
-  kReplaced,      // by a session of the same reporter for another service
+  kReplaced,      // by another session of its client under the same identifier
   kDisconnected,  // its client has gone
   kInterrupted,   // the daemon has gone
 };

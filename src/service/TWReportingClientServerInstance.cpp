@@ -83,10 +83,13 @@ void TWReportingClientServerInstance::createReportingSession(ReporterID reporter
       return reply(messagingError(kOverLimit, "the connection holds " + std::to_string(sessions.size()) +
                                                   " sessions, the most there may be"));
     }
-    // An earlier session with this identifier is dropped without a stop, because its client has given it up.
     const Session session = self.makeSession(reporterID);
     if (!session->takeOwnBytes()) return reply(overBudget(*self.budget_));
     session->setClientProcessName(self.clientProcessName());
+    // An earlier session with this identifier is dropped without a stop, because its client has given it up.
+    if (const auto earlier = sessions.find(reporterID); earlier != sessions.end()) {
+      earlier->second->endLife(SessionEnding::kReplaced);
+    }
     self.setSession(reporterID, session);
     TWReportingContext::current().journal().opened(self.journalClient_, reporterID,
                                                    self.lastConnectionRecord_);

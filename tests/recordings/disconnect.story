@@ -27,8 +27,8 @@ Input summaries: 0. A stretch of input must be longer than 0.5 s.
 What was forwarded of it is not known: the store does not record sendings by session.
 --------
 Session 2: org.example.Phone (process unknown, user 1000) for telephony, reporter 8.
-It began at 2026-01-01T00:00:00Z and ended at 2026-01-01T00:00:05Z, after 5 s: a session of the same
-client for another service replaced it.
+It began at 2026-01-01T00:00:00Z and ended at 2026-01-01T00:00:05Z, after 5 s: a new session of the
+same client replaced it.
 1 message, 0 of them redundant; 0 overloads; 0 s active.
 
 Messages, by the seconds since it began
@@ -50,12 +50,13 @@ No producer looked for stretches.
 What was forwarded of it is not known: the store does not record sendings by session.
 --------
 Session 4: org.example.Player (process unknown, user 1000) for longformaudio, reporter 7.
-It began at 2026-01-01T00:00:08Z and has not ended.
+It began at 2026-01-01T00:00:08Z and ended at 2026-01-01T00:00:09Z, after 1 s: a new session of the
+same client replaced it.
+0 messages, 0 of them redundant; 0 overloads; 0 s active.
 
 Messages, by the seconds since it began
   none
 
-If it stopped now:
 No producer looked for stretches.
 
 What was forwarded of it is not known: the store does not record sendings by session.

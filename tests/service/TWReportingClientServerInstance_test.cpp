@@ -76,6 +76,18 @@ TEST_F(RequestTest, CreatingTheSameIdentifierTwiceDropsTheFirstSessionWithoutASt
   EXPECT_THAT(journal.take(), Not(Contains("Metricon stopped")));
 }
 
+// It would otherwise be shown as one that runs, for as long as the daemon does.
+TEST_F(RequestTest, TheLifeOfASessionThatIsCreatedAnewEnds) {
+  start(*client, 77);
+  ASSERT_THAT(test.sessionBook.entries(), SizeIs(1));
+  create(*client, 77);
+  const auto entries = test.sessionBook.entries();
+  ASSERT_THAT(entries, SizeIs(2));
+  EXPECT_EQ(entries[1].life, entries[0].life);
+  ASSERT_TRUE(entries[1].end);
+  EXPECT_EQ(entries[1].end->ending, SessionEnding::kReplaced);
+}
+
 TEST_F(RequestTest, IdentifierZeroIsStoredAndReachedOnlyWhenTheClientEnds) {
   create(*client, 0);
   const std::weak_ptr<TWReportingSession> session = sessionOf(0, 0);

@@ -155,8 +155,9 @@ std::vector<StoreView> makeViews() {
         {"started_at", "real", "when it began"},
         {"ended_at", "real", "when it ended; null while it runs"},
         {"ending", "text",
-         "\"stopped\", \"replaced\" (by a session for another service), \"disconnected\" (its client had "
-         "gone) or \"interrupted\" (the daemon had gone); null while it runs"},
+         "\"stopped\", \"replaced\" (by another session of its client under the same identifier), "
+         "\"disconnected\" (its client had gone) or \"interrupted\" (the daemon had gone); null while it "
+         "runs"},
         {"messages", "integer", "received, without the summaries made at its end; null while it runs"},
         {"unique_messages", "integer", "those that repeated none; null while it runs"},
         {"redundant_messages", "integer", "those that repeated another one; null while it runs"},

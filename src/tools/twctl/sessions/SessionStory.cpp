@@ -61,7 +61,7 @@ std::string whatRuns(const ReasonedLife::Walk& walk) {
 std::string endingText(const StoredSession& session) {
   std::string ending = session.ending.value_or("");
   if (ending == "stopped") return "it was stopped";
-  if (ending == "replaced") return "a session of the same client for another service replaced it";
+  if (ending == "replaced") return "a new session of the same client replaced it";
   if (ending == "disconnected") return "its client had gone";
   if (ending == "interrupted") return "the daemon had gone";
   return ending;
