@@ -84,7 +84,7 @@ bool StoreDatabase::beginAnew() {
   close();
   holdings_.forget();
   if (!saveRows(damage)) return false;
-  ++fileNumber_;  // sessions may be lost
+  opened_.reset();
   return takeSalvaged();
 }
 
@@ -161,6 +161,12 @@ StoreDatabase::Result StoreDatabase::open() {
     return fail();
   }
   applyBounds();
+  const std::optional<FileIdentity> identity = identityOf(path_);
+  const bool isKnown = identity && identity == opened_;
+  if (!isKnown) {  // before the tables learn the file's number
+    ++fileNumber_;
+    holdings_.forget();
+  }
   begin_ = database_.prepare("BEGIN IMMEDIATE");
   commit_ = database_.prepare("COMMIT");
   const std::optional<StoreRowIds> floors = readStoreFloors(database_);
@@ -174,26 +180,20 @@ StoreDatabase::Result StoreDatabase::open() {
   marks_.emplace(database_);
   trimmer_.emplace(database_, holdings_, clock_);
   if (!ensureStoreViews(database_)) return fail();
-  const bool isKnown = recognizeFile();
   if (!isKnown && !LifeTable::endInterrupted(database_)) return fail();
   if (!age_.open(isKnown)) return fail();
+  opened_ = identity;
   return Result::kDone;
 }
 
-bool StoreDatabase::recognizeFile() {
+std::optional<StoreDatabase::FileIdentity> StoreDatabase::identityOf(const std::string& path) {
   struct stat status {};
-  const bool isKnown = ::stat(path_.c_str(), &status) == 0 && fileNumber_ == openedNumber_ &&
-                       status.st_dev == device_ && status.st_ino == inode_;
-  if (!isKnown) holdings_.forget();
-  openedNumber_ = fileNumber_;
-  device_ = status.st_dev;
-  inode_ = status.st_ino;
-  return isKnown;
+  if (::stat(path.c_str(), &status) != 0) return std::nullopt;
+  return FileIdentity{status.st_dev, status.st_ino};
 }
 
 bool StoreDatabase::prepareFile() {
-  ++fileNumber_;
-  holdings_.forget();  // it may have the number of a file that was removed
+  opened_.reset();  // it may have the identity of a file that was removed
   return database_.run(storeFileSettings() + "PRAGMA journal_mode = WAL") && database_.run(storeSchema());
 }
 

@@ -74,6 +74,15 @@ class StoreDatabase {
   const std::string& problem() const { return problem_; }
 
  private:
+  struct FileIdentity {
+    dev_t device = 0;
+    ino_t inode = 0;
+
+    friend bool operator==(const FileIdentity&, const FileIdentity&) = default;
+  };
+
+  // None when there is no such file.
+  static std::optional<FileIdentity> identityOf(const std::string& path);
   [[nodiscard]] Result open();
   [[nodiscard]] bool prepareFile();
   [[nodiscard]] bool saveRows(const std::string& damage);
@@ -86,8 +95,6 @@ class StoreDatabase {
   [[nodiscard]] bool migrate(std::int64_t version);
   [[nodiscard]] bool insert(const StoreBatch& batch);
   void applyBounds();
-  // Whether the path has the same file as before. Forgets what users hold if not.
-  [[nodiscard]] bool recognizeFile();
   [[nodiscard]] Result resultOf(StoreTrimmer::Outcome outcome, bool& moreToDo);
   [[nodiscard]] Result fail();
   [[nodiscard]] Result failWith(std::string problem);
@@ -113,12 +120,11 @@ class StoreDatabase {
   std::optional<LifeTable> lives_;
   std::optional<StoreMarkTable> marks_;
   std::optional<StoreTrimmer> trimmer_;
-  // Numbers the files that this process began or found; this is the open one's number.
-  std::uint64_t fileNumber_ = 1;
-  // Identify the file that was opened last.
-  std::uint64_t openedNumber_ = 0;
-  dev_t device_ = 0;
-  ino_t inode_ = 0;
+  // Numbers the files that this process began or found; this is the open one's number. Lives and sessions
+  // have their identifiers in the file of one number only.
+  std::uint64_t fileNumber_ = 0;
+  // The file that was opened last, if it may still be the one of this number.
+  std::optional<FileIdentity> opened_;
   StoreBounds bounds_;
   std::int64_t salvagedRows_ = 0;
   std::optional<std::chrono::nanoseconds> nextSalvage_;  // after one that had no room

@@ -144,6 +144,30 @@ TEST_F(LifeTableTest, ANewFileGetsTheLifeAgain) {
   EXPECT_THAT(events(), ElementsAre(R"(1 {"n":2})"));
 }
 
+// The file has rows with the identifiers that the lives had in the one before.
+TEST_F(LifeTableTest, AFileThatIsPutInPlaceKeepsItsRowsAndGetsTheLivesThatGoOn) {
+  const TemporaryDirectory other;
+  {
+    StoreDatabase backup(other.path(), json_, clock_);
+    StoreBatch batch;
+    const LifeRow row{makeLife(0, 8), "", "", endAt(2.0)};
+    batch.add(row, StoreRowText(row));
+    ASSERT_EQ(backup.write(batch), Result::kDone);
+  }
+  const auto life = makeLife(0);
+  const auto rtc = std::make_shared<RtcSessionRecord>();
+  ASSERT_EQ(write(LifeRow{life, "", ""}, RtcMessageRow{1.0, rtc, 4, 1, {{"m", 1}}}), Result::kDone);
+  for (const char* suffix : {"", "-wal", "-shm"}) {
+    std::filesystem::rename(path() + suffix, directory_.path("old.db") + suffix);
+  }
+  std::filesystem::copy_file(other.path("reports.db"), path());
+  EXPECT_EQ(write(RtcMessageRow{2.0, rtc, 4, 1, {{"m", 2}}}, LifeRow{life, "", "", endAt(4.0)}),
+            Result::kDone);
+  EXPECT_THAT(lives(), ElementsAre("1 8 2.0 stopped", "2 7 4.0 stopped"));
+  EXPECT_THAT(rows("SELECT m.payload FROM rtc_message AS m JOIN rtc_session AS s ON s.id = m.rtc_session", 1),
+              ElementsAre(R"({"m":2})"));
+}
+
 TEST_F(LifeTableTest, AnUndoneTransactionHasNoEffect) {
   ASSERT_EQ(write(LifeRow{makeLife(2), "", ""}), Result::kDone);
   const auto life = makeLife(3);
