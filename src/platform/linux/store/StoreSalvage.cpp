@@ -82,7 +82,7 @@ bool StoreSalvage::copyAll() {
              " WHERE name_set NOT IN (SELECT name_set FROM analytics_name)");
 }
 
-// The index has the names, too.
+// The index has the names, too. It lacks what messages are, as the tables of earlier versions do.
 bool StoreSalvage::copyNames() {
   if (!has("table", "analytics_name")) return true;
   const std::string columns = "name_set, position, name";
@@ -92,7 +92,7 @@ bool StoreSalvage::copyNames() {
   if (copied == Copied::kSome && has("index", "analytics_name_by_name")) {
     copied = copyTable("analytics_name", columns, 3, " INDEXED BY analytics_name_by_name ORDER BY name");
   }
-  return copied != Copied::kFailed;
+  return copied != Copied::kFailed && made_.run(storeKindsOfNames());
 }
 
 bool StoreSalvage::copyAgeMarks() {

@@ -93,7 +93,7 @@ constexpr std::string_view kUserColumns = R"(
   ALTER TABLE rtc_row ADD COLUMN user_id INTEGER;
 )";
 
-// Category and type are in the framework's name. Who has made a message is not known.
+// Who has made a message is not known.
 constexpr std::string_view kFromVersion2 = R"(
   ALTER TABLE analytics_row ADD COLUMN session INTEGER;
   ALTER TABLE analytics_row ADD COLUMN began_at REAL;
@@ -101,9 +101,13 @@ constexpr std::string_view kFromVersion2 = R"(
   ALTER TABLE analytics_name ADD COLUMN category TEXT;
   ALTER TABLE analytics_name ADD COLUMN type TEXT;
   ALTER TABLE analytics_name ADD COLUMN source TEXT;
+)";
+
+constexpr std::string_view kKindsOfNames = R"(
   UPDATE analytics_name SET category = substr(name, 21, instr(substr(name, 21), '.') - 1),
                             type = substr(name, 21 + instr(substr(name, 21), '.'))
-    WHERE position = 0 AND name GLOB 'com.orvane.tonewerk.*.*' AND name NOT GLOB 'com.orvane.tonewerk.*.*.*';
+    WHERE position = 0 AND category IS NULL AND name GLOB 'com.orvane.tonewerk.*.*' AND
+          name NOT GLOB 'com.orvane.tonewerk.*.*.*';
 )";
 
 constexpr std::string_view kAgeOfSessions =
@@ -131,11 +135,14 @@ std::string storeSchema() {
   return inTransaction(sql);
 }
 
+std::string storeKindsOfNames() { return std::string(kKindsOfNames); }
+
 std::string storeMigration(const EarlierStore& store) {
   std::string sql;
   if (store.version == 1) sql.append(kFromVersion1).append(kRtcView);
   if (!store.hasUsers) sql += kUserColumns;
   sql += kFromVersion2;
+  sql += kKindsOfNames;
   sql += kSessionTable;
   sql += kStretchIndex;
   sql += store.hasAges ? kAgeOfSessions : kAgeTables;

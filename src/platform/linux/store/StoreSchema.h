@@ -77,6 +77,10 @@ std::string storeFileSettings();
 // The SQL that makes the schema in an empty database, user_version included, in one transaction.
 std::string storeSchema();
 
+// The SQL that gives messages' names that lack them the category and the type, which are in the framework's
+// name.
+std::string storeKindsOfNames();
+
 // What a database of an earlier version has.
 struct EarlierStore {
   std::int64_t version = 0;

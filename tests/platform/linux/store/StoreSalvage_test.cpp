@@ -12,6 +12,7 @@
 #include <utility>
 #include <vector>
 
+#include "platform/linux/store/EarlierFile.h"
 #include "platform/linux/store/FullDisk.h"
 #include "platform/linux/store/RowsOf.h"
 #include "platform/linux/store/StoreDatabase.h"
@@ -324,6 +325,46 @@ TEST_F(StoreSalvageTest, AFileOfVersionOneIsSavedAsOneOfThisVersion) {
   ASSERT_TRUE(file.open(salvaged(), SqliteDatabase::Mode::kReadOnly, kLongEnough));
   EXPECT_THAT(rowsOf(file, "SELECT id FROM rtc_message UNION SELECT id FROM analytics_event ORDER BY id"),
               ElementsAre("9", "14"));
+}
+
+// Without category and type a message is no event, and a summary no stretch.
+TEST_F(StoreSalvageTest, MessagesOfAFileOfVersionTwoHaveTheCategoryAndTypeOfTheirNames) {
+  SqliteDatabase file;
+  ASSERT_TRUE(file.open(path(), SqliteDatabase::Mode::kReadWrite, kLongEnough));
+  ASSERT_TRUE(
+      file.run(intoVersion2WithoutAges() +
+               "INSERT INTO analytics_name VALUES (50, 0, 'com.orvane.tonewerk.Volume.Summary'),"
+               " (50, 1, 'com.orvane.telephony.Volume.Summary');"
+               "INSERT INTO analytics_row (id, recorded_at, name_set, payload) VALUES"
+               " (5000, 1.5, 50, '{\"play_seconds\":2.5}')"))
+      << file.problem();
+  file.close();
+  damagePage(pageOf("power_event"));
+  const StoreSalvage salvage(path(), salvaged());
+  EXPECT_EQ(salvage.problem(), "");
+  ASSERT_TRUE(file.open(salvaged(), SqliteDatabase::Mode::kReadOnly, kLongEnough));
+  EXPECT_THAT(rowsOf(file, "SELECT id, category, type, source IS NULL FROM event", 4),
+              ElementsAre("5000 Volume Summary 1"));
+  EXPECT_THAT(rowsOf(file, "SELECT seconds FROM volume_stretch"), ElementsAre("2.5"));
+}
+
+// The index lacks category and type.
+TEST_F(StoreSalvageTest, MessagesWhoseNamesAreReadFromTheIndexHaveTheCategoryAndTypeOfTheirNames) {
+  {
+    StoreDatabase store(directory_.path(), json_, clock_);
+    const AnalyticsRow event{clock_.now(),
+                             "com.orvane.tonewerk.Volume.Summary",
+                             {{"play_seconds", 2.5}},
+                             {.category = kCategoryVolume, .type = kTypeSummary}};
+    StoreBatch batch;
+    add(batch, event);
+    ASSERT_EQ(store.write(batch), StoreDatabase::Result::kDone);
+  }
+  damagePage(pageOf("analytics_name"));
+  const StoreSalvage salvage(path(), salvaged());
+  SqliteDatabase file;
+  ASSERT_TRUE(file.open(salvaged(), SqliteDatabase::Mode::kReadOnly, kLongEnough));
+  EXPECT_THAT(rowsOf(file, "SELECT category, type FROM event", 2), ElementsAre("Volume Summary"));
 }
 
 // --- Identifiers after a salvage ---
