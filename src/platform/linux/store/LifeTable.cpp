@@ -73,7 +73,6 @@ bool LifeTable::place(const std::shared_ptr<SessionLife>& life, std::uint32_t us
     const auto inserted = database_.number("SELECT last_insert_rowid()");
     if (!inserted) return false;
     identifier = *inserted;
-    newRows_.push_back(user);
     if (rowsFrom_) rows_[{life->beginning.request, life->beginning.reporterID}] = identifier;
   }
   life->place = {identifier, fileNumber_};
@@ -112,7 +111,7 @@ bool LifeTable::readRowsFrom(std::uint64_t request) {
   return step == SqliteStatement::Step::kDone;
 }
 
-bool LifeTable::insert(const SessionBeginning& beginning, std::uint32_t user) {
+bool LifeTable::insert(const SessionBeginning& beginning, std::uint32_t user, std::int64_t identifier) {
   insert_.bind(1, beginning.at);
   if (beginning.request == 0) {
     insert_.bindNull(2);
@@ -126,13 +125,16 @@ bool LifeTable::insert(const SessionBeginning& beginning, std::uint32_t user) {
   } else {
     insert_.bind(5, static_cast<std::int64_t>(user));
   }
-  if (floor_ == 0) {
+  const bool isNew = identifier == 0;
+  if (isNew && floor_ > 0) identifier = floor_ + 1;
+  if (identifier == 0) {
     insert_.bindNull(6);
   } else {
-    insert_.bind(6, floor_ + 1);
+    insert_.bind(6, identifier);
   }
   if (!insert_.run()) return false;
-  floor_ = 0;
+  if (isNew) floor_ = 0;
+  newRows_.push_back(user);
   return true;
 }
 
@@ -150,7 +152,11 @@ bool LifeTable::change(const StoreBatch& batch, const StoreBatch::Session& row) 
   } else {
     for (int parameter = 4; parameter <= 9; ++parameter) change_.bindNull(parameter);
   }
-  return change_.run();
+  if (!change_.run()) return false;
+  if (database_.changes() > 0) return true;
+  // The file has lost the row. Events that are still there name it.
+  const std::shared_ptr<SessionLife>& life = batch.lives()[row.life];
+  return insert(life->beginning, batch.lifeUsers()[row.life], life->place.identifier) && change_.run();
 }
 
 }  // namespace tonewerk

@@ -52,7 +52,9 @@ class LifeTable {
   // The row of a life that an earlier daemon, or an earlier file, had; 0 when there is none. None on failure.
   [[nodiscard]] std::optional<std::int64_t> find(const SessionBeginning& beginning);
   [[nodiscard]] bool readRowsFrom(std::uint64_t request);
-  [[nodiscard]] bool insert(const SessionBeginning& beginning, std::uint32_t user);
+  // Inserts a row with this identifier, or with the next one when it is 0.
+  [[nodiscard]] bool insert(const SessionBeginning& beginning, std::uint32_t user,
+                            std::int64_t identifier = 0);
   [[nodiscard]] bool change(const StoreBatch& batch, const StoreBatch::Session& row);
 
   SqliteDatabase& database_;

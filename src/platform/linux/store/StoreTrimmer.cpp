@@ -34,14 +34,22 @@ constexpr std::int64_t kSpareFreePages = 64;
 // Rows of more bytes have pages of their own.
 constexpr std::int64_t kSmallRowBytes = 4096;
 
+// What rows must fulfil to be deleted.
+std::string conditionOf(const StoreTable& table) {
+  return table.name == "session_row" ? " AND ended_at IS NOT NULL" : "";
+}
+
 // Orders by identifier, which changes of the clock do not affect. The newest row stays, so that its
 // identifier is not used again: a reader that continues after the last row it saw misses none. That of
 // rtc_row may go when an analytics row has a higher identifier, because new messages are numbered above both.
+// The row of a session that runs stays, too: its end completes the row. When others are deleted for the size
+// meanwhile, it is later deleted for its age only. A daemon's start ends the rows that an earlier one left.
 std::string oldestRows(const StoreTable& table, const std::string& columns) {
   const std::string name(table.name);
   std::string newest = "(SELECT max(id) FROM " + name + ")";
   if (name == "rtc_row") newest = "max(" + newest + ", coalesce((SELECT max(id) FROM analytics_row), 0))";
-  return "SELECT " + columns + " FROM " + name + " WHERE id >= ?1 AND id < " + newest + " ORDER BY id";
+  return "SELECT " + columns + " FROM " + name + " WHERE id >= ?1 AND id < " + newest + conditionOf(table) +
+         " ORDER BY id";
 }
 
 std::string oldestChunk(const StoreTable& table) {
@@ -473,7 +481,8 @@ std::int64_t StoreTrimmer::deleteOldest(std::int64_t bytes) {
 
 bool StoreTrimmer::deleteRows(const StoreTable& table, std::uint32_t user, const RowRange& rows) {
   SqliteStatement statement = database_.prepare("DELETE FROM " + std::string(table.name) +
-                                                " WHERE id BETWEEN ?1 AND ?2 AND user_id IS ?3");
+                                                " WHERE id BETWEEN ?1 AND ?2 AND user_id IS ?3" +
+                                                conditionOf(table));
   statement.bind(1, rows.first);
   statement.bind(2, rows.last);
   bindUser(statement, 3, user);

@@ -17,7 +17,6 @@ namespace tonewerk {
 namespace {
 
 using testing::ElementsAre;
-using testing::IsEmpty;
 
 using Result = StoreDatabase::Result;
 
@@ -54,6 +53,12 @@ class LifeTableTest : public testing::Test {
     SqliteDatabase database;
     EXPECT_TRUE(database.open(path(), SqliteDatabase::Mode::kReadOnly, std::chrono::seconds(30)));
     return rowsOf(database, sql, columns);
+  }
+  void trimAge() {
+    for (bool moreToDo = true; moreToDo;) {
+      moreToDo = false;
+      ASSERT_EQ(store_->trimAge(moreToDo), Result::kDone);
+    }
   }
   std::vector<std::string> lives() {
     return rows(
@@ -185,14 +190,61 @@ TEST_F(LifeTableTest, AnUndoneTransactionHasNoEffect) {
   EXPECT_THAT(rows("SELECT ending IS NULL FROM session", 1), ElementsAre("1", "1"));  // it is the same daemon
 }
 
-TEST_F(LifeTableTest, TheEndOfALifeWhoseRowIsGoneMakesNoRow) {
+TEST_F(LifeTableTest, TheEndOfALifeWhoseRowIsGoneMakesItAnew) {
   const auto life = makeLife(3);
   ASSERT_EQ(write(LifeRow{life, "", ""}), Result::kDone);
   SqliteDatabase other;
   ASSERT_TRUE(other.open(path(), SqliteDatabase::Mode::kReadWrite, std::chrono::seconds(30)));
   ASSERT_TRUE(other.run("DELETE FROM session_row"));
-  EXPECT_EQ(write(LifeRow{life, "", "", endAt(4.0)}), Result::kDone);
-  EXPECT_THAT(lives(), IsEmpty());
+  EXPECT_EQ(write(LifeRow{life, "app", "", endAt(4.0)}), Result::kDone);
+  EXPECT_THAT(rows("SELECT id, reporter_id, application, started_at, ended_at FROM session", 5),
+              ElementsAre("1 7 app 1.0 4.0"));
+}
+
+TEST_F(LifeTableTest, TheRowOfASessionThatRunsIsKeptHoweverOldItIs) {
+  const auto running = makeLife(0);
+  ASSERT_EQ(write(LifeRow{running, "", ""}, LifeRow{makeLife(0, 8), "", "", endAt(2.0)},
+                  LifeRow{makeLife(0, 9), "", "", endAt(2.0)}),  // the newest row always stays
+            Result::kDone);
+  store_->setBounds({.seconds = 1.0});
+  clock_.advance(std::chrono::hours(3));
+  ASSERT_EQ(write(), Result::kDone);
+  trimAge();
+  EXPECT_THAT(lives(), ElementsAre("1 7 open ", "3 9 2.0 stopped"));
+  ASSERT_EQ(write(LifeRow{running, "", "", endAt(4.0)}), Result::kDone);
+  trimAge();
+  EXPECT_THAT(lives(), ElementsAre("3 9 2.0 stopped"));
+}
+
+TEST_F(LifeTableTest, MoreSessionsThatRunThanARoundLooksAtDoNotKeepTheRowsAfterThem) {
+  std::vector<std::shared_ptr<SessionLife>> running;
+  StoreBatch batch;
+  for (int reporter = 1; reporter <= 1000; ++reporter) {
+    const LifeRow row{running.emplace_back(makeLife(0, reporter)), "", ""};
+    batch.add(row, StoreRowText(row));
+  }
+  ASSERT_EQ(store_->write(batch), Result::kDone);
+  ASSERT_EQ(write(LifeRow{makeLife(0, 2001), "", "", endAt(2.0)}, LifeRow{makeLife(0, 2002), "", ""}),
+            Result::kDone);
+  store_->setBounds({.seconds = 1.0});
+  clock_.advance(std::chrono::hours(3));
+  ASSERT_EQ(write(), Result::kDone);
+  trimAge();
+  EXPECT_THAT(rows("SELECT count(*), count(ended_at) FROM session", 2), ElementsAre("1001 0"));
+}
+
+TEST_F(LifeTableTest, TheRowOfASessionThatRunsIsKeptHoweverFullTheFileIs) {
+  ASSERT_EQ(write(LifeRow{makeLife(0), "", ""}, LifeRow{makeLife(0, 8), "", "", endAt(2.0)},
+                  LifeRow{makeLife(0, 9), "", "", endAt(2.0)}),
+            Result::kDone);
+  store_->setBounds({.bytes = 1 << 20});
+  const PowerRow row{5.0, 28, "power", {{"text", std::string(20'000, 'x')}}};
+  for (int n = 0; n < 100; ++n) ASSERT_EQ(write(row), Result::kDone);
+  for (bool moreToDo = true; moreToDo;) {
+    moreToDo = false;
+    ASSERT_EQ(store_->trimSize(moreToDo), Result::kDone);
+  }
+  EXPECT_THAT(lives(), ElementsAre("1 7 open ", "3 9 2.0 stopped"));
 }
 
 }  // namespace
