@@ -30,9 +30,9 @@ void bindName(SqliteStatement& statement, int parameter, std::string_view name) 
 
 }  // namespace
 
-LifeTable::LifeTable(SqliteDatabase& database, std::uint64_t fileNumber, std::int64_t floor)
+LifeTable::LifeTable(SqliteDatabase& database, FileNumbers file, std::int64_t floor)
     : database_(database),
-      fileNumber_(fileNumber),
+      file_(file),
       floor_(floor),
       insert_(
           database.prepare("INSERT INTO session_row (id, started_at, request, reporter_id, service, user_id)"
@@ -42,7 +42,7 @@ LifeTable::LifeTable(SqliteDatabase& database, std::uint64_t fileNumber, std::in
           " redundant_messages = ?7, active_seconds = ?8, overloads = ?9 WHERE id = ?1")) {}
 
 LifeTable::~LifeTable() {
-  for (const auto& life : uncommitted_) life->place = {};
+  for (auto at = uncommitted_.rbegin(); at != uncommitted_.rend(); ++at) at->first->place = at->second;
 }
 
 bool LifeTable::write(const StoreBatch& batch) {
@@ -64,19 +64,44 @@ bool LifeTable::endInterrupted(SqliteDatabase& database) {
 }
 
 bool LifeTable::place(const std::shared_ptr<SessionLife>& life, std::uint32_t user) {
-  if (life->place.file == fileNumber_) return true;
+  if (life->place.file == file_.own) return true;
+  if (life->place.file >= file_.firstSaved) return placeSaved(life, user);
   const std::optional<std::int64_t> found = find(life->beginning);
   if (!found) return false;
-  std::int64_t identifier = *found;
-  if (identifier == 0) {
-    if (!insert(life->beginning, user)) return false;
-    const auto inserted = database_.number("SELECT last_insert_rowid()");
-    if (!inserted) return false;
-    identifier = *inserted;
-    if (rowsFrom_) rows_[{life->beginning.request, life->beginning.reporterID}] = identifier;
+  if (*found == 0) {
+    if (!placeNew(life, user, 0)) return false;
+    if (rowsFrom_) rows_[{life->beginning.request, life->beginning.reporterID}] = life->place.identifier;
+    return true;
   }
-  life->place = {identifier, fileNumber_};
-  uncommitted_.push_back(life);
+  uncommitted_.emplace_back(life, life->place);
+  life->place = {*found, file_.own};
+  return true;
+}
+
+// When the file has lost its newest rows without a trace, another life may have got the identifier.
+bool LifeTable::placeSaved(const std::shared_ptr<SessionLife>& life, std::uint32_t user) {
+  SqliteStatement select =
+      database_.prepare("SELECT reporter_id = ?2 AND started_at = ?3 FROM session_row WHERE id = ?1");
+  select.bind(1, life->place.identifier);
+  select.bind(2, life->beginning.reporterID);
+  select.bind(3, life->beginning.at);
+  const SqliteStatement::Step step = select.step();
+  if (step == SqliteStatement::Step::kFailed) return false;
+  if (step == SqliteStatement::Step::kDone) return placeNew(life, user, life->place.identifier);
+  const bool isIts = select.integer(0) == 1;
+  select.reset();
+  if (!isIts) return placeNew(life, user, 0);
+  life->place.file = file_.own;
+  return true;
+}
+
+bool LifeTable::placeNew(const std::shared_ptr<SessionLife>& life, std::uint32_t user,
+                         std::int64_t identifier) {
+  if (!insert(life->beginning, user, identifier)) return false;
+  const auto inserted = database_.number("SELECT last_insert_rowid()");
+  if (!inserted) return false;
+  uncommitted_.emplace_back(life, life->place);
+  life->place = {*inserted, file_.own};
   return true;
 }
 

@@ -23,10 +23,16 @@ namespace tonewerk {
 // which it began.
 class LifeTable {
  public:
-  // `database` outlives it. `fileNumber` distinguishes this file from those that the process wrote before.
-  // The first row is numbered above `floor`. Prepares its statements. Whether that succeeded shows in the
-  // first write().
-  LifeTable(SqliteDatabase& database, std::uint64_t fileNumber, std::int64_t floor);
+  // The files that this process wrote have ever higher numbers.
+  struct FileNumbers {
+    std::uint64_t own = 0;
+    // This file has what was saved of the files from this number on. The same as `own` when there are none.
+    std::uint64_t firstSaved = 0;
+  };
+
+  // `database` outlives it. The first row is numbered above `floor`. Prepares its statements. Whether that
+  // succeeded shows in the first write().
+  LifeTable(SqliteDatabase& database, FileNumbers file, std::int64_t floor);
   LifeTable(const LifeTable&) = delete;
   LifeTable& operator=(const LifeTable&) = delete;
   // Takes back the place of lives that were not committed.
@@ -49,6 +55,11 @@ class LifeTable {
   using Key = std::pair<std::uint64_t, std::int64_t>;
 
   [[nodiscard]] bool place(const std::shared_ptr<SessionLife>& life, std::uint32_t user);
+  // Finds the row of a life whose place is in a file that was saved, or inserts it if it was lost.
+  [[nodiscard]] bool placeSaved(const std::shared_ptr<SessionLife>& life, std::uint32_t user);
+  // Inserts the row of a life and makes it the life's place.
+  [[nodiscard]] bool placeNew(const std::shared_ptr<SessionLife>& life, std::uint32_t user,
+                              std::int64_t identifier);
   // The row of a life that an earlier daemon, or an earlier file, had; 0 when there is none. None on failure.
   [[nodiscard]] std::optional<std::int64_t> find(const SessionBeginning& beginning);
   [[nodiscard]] bool readRowsFrom(std::uint64_t request);
@@ -58,7 +69,7 @@ class LifeTable {
   [[nodiscard]] bool change(const StoreBatch& batch, const StoreBatch::Session& row);
 
   SqliteDatabase& database_;
-  const std::uint64_t fileNumber_;
+  const FileNumbers file_;
   std::int64_t floor_;  // 0 when the rows in the table say it
   SqliteStatement insert_;
   SqliteStatement change_;
@@ -66,7 +77,8 @@ class LifeTable {
   // While a journal is played: the rows of its requests.
   std::map<Key, std::int64_t> rows_;
   std::optional<std::uint64_t> rowsFrom_;  // the lowest request in rows_
-  std::vector<std::shared_ptr<SessionLife>> uncommitted_;
+  // The lives whose places are not committed, with those from before.
+  std::vector<std::pair<std::shared_ptr<SessionLife>, SessionLife::Place>> uncommitted_;
   std::vector<std::uint32_t> newRows_;
 };
 

@@ -83,8 +83,11 @@ bool StoreDatabase::beginAnew() {
   const std::string damage = problem_;
   close();
   holdings_.forget();
+  const std::optional<FileIdentity> damaged = identityOf(path_);
+  const bool hasOwnLives = damaged && (damaged == opened_ || damaged == saved_);
   if (!saveRows(damage)) return false;
   opened_.reset();
+  saved_ = hasOwnLives ? identityOf(path_ + std::string(kSalvaged)) : std::nullopt;
   return takeSalvaged();
 }
 
@@ -163,8 +166,10 @@ StoreDatabase::Result StoreDatabase::open() {
   applyBounds();
   const std::optional<FileIdentity> identity = identityOf(path_);
   const bool isKnown = identity && identity == opened_;
+  const bool isSaved = identity && identity == saved_;
   if (!isKnown) {  // before the tables learn the file's number
     ++fileNumber_;
+    if (!isSaved) firstSavedNumber_ = fileNumber_;
     holdings_.forget();
   }
   begin_ = database_.prepare("BEGIN IMMEDIATE");
@@ -176,13 +181,15 @@ StoreDatabase::Result StoreDatabase::open() {
   metrics_.emplace(database_, (*floors)[storeTableIndex("metric")]);
   power_.emplace(database_, (*floors)[storeTableIndex("power_event")]);
   rtc_.emplace(database_, json_, fileNumber_, (*floors)[storeTableIndex("rtc_session")]);
-  lives_.emplace(database_, fileNumber_, (*floors)[storeTableIndex("session_row")]);
+  lives_.emplace(database_, LifeTable::FileNumbers{fileNumber_, firstSavedNumber_},
+                 (*floors)[storeTableIndex("session_row")]);
   marks_.emplace(database_);
   trimmer_.emplace(database_, holdings_, clock_);
   if (!ensureStoreViews(database_)) return fail();
-  if (!isKnown && !LifeTable::endInterrupted(database_)) return fail();
+  if (!isKnown && !isSaved && !LifeTable::endInterrupted(database_)) return fail();
   if (!age_.open(isKnown)) return fail();
   opened_ = identity;
+  saved_.reset();
   return Result::kDone;
 }
 
@@ -193,7 +200,8 @@ std::optional<StoreDatabase::FileIdentity> StoreDatabase::identityOf(const std::
 }
 
 bool StoreDatabase::prepareFile() {
-  opened_.reset();  // it may have the identity of a file that was removed
+  opened_.reset();
+  saved_.reset();  // it may have the identity of a file that was removed
   return database_.run(storeFileSettings() + "PRAGMA journal_mode = WAL") && database_.run(storeSchema());
 }
 

@@ -120,11 +120,15 @@ class StoreDatabase {
   std::optional<LifeTable> lives_;
   std::optional<StoreMarkTable> marks_;
   std::optional<StoreTrimmer> trimmer_;
-  // Numbers the files that this process began or found; this is the open one's number. Lives and sessions
+  // Numbers the files that this process began or found; this is the open one's number. Sessions
   // have their identifiers in the file of one number only.
   std::uint64_t fileNumber_ = 0;
   // The file that was opened last, if it may still be the one of this number.
   std::optional<FileIdentity> opened_;
+  // The file that has, or will have, the place of a damaged one that this process wrote. The lives that it has
+  // are this process's, and have the identifiers that they had in the files from this number on.
+  std::optional<FileIdentity> saved_;
+  std::uint64_t firstSavedNumber_ = 0;
   StoreBounds bounds_;
   std::int64_t salvagedRows_ = 0;
   std::optional<std::chrono::nanoseconds> nextSalvage_;  // after one that had no room

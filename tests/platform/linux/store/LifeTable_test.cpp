@@ -2,6 +2,7 @@
 #include "platform/linux/store/LifeTable.h"
 
 #include <filesystem>
+#include <fstream>
 #include <gmock/gmock.h>
 #include <memory>
 #include <string>
@@ -47,6 +48,22 @@ class LifeTableTest : public testing::Test {
   void crash() {
     store_.reset();
     store_ = std::make_unique<StoreDatabase>(directory_.path(), json_, clock_);
+  }
+
+  // Overwrites the first page of a table.
+  void damage(const std::string& table) {
+    std::int64_t page = 0;
+    {
+      SqliteDatabase other;
+      ASSERT_TRUE(other.open(path(), SqliteDatabase::Mode::kReadWrite, std::chrono::seconds(30)));
+      ASSERT_TRUE(other.run("PRAGMA wal_checkpoint(TRUNCATE)"));
+      page = other.number("SELECT rootpage FROM sqlite_master WHERE name = '" + table + "'").value_or(0);
+    }
+    ASSERT_GT(page, 1);
+    constexpr std::int64_t kPageBytes = 8192;
+    std::fstream file(path(), std::ios::in | std::ios::out | std::ios::binary);
+    file.seekp((page - 1) * kPageBytes);
+    file << std::string(kPageBytes, '\xff');
   }
 
   std::vector<std::string> rows(const std::string& sql, int columns) {
@@ -188,6 +205,60 @@ TEST_F(LifeTableTest, AnUndoneTransactionHasNoEffect) {
   EXPECT_EQ(write(eventOf(life, 1)), Result::kDone);
   EXPECT_THAT(events(), ElementsAre(R"(2 {"n":1})"));
   EXPECT_THAT(rows("SELECT ending IS NULL FROM session", 1), ElementsAre("1", "1"));  // it is the same daemon
+}
+
+TEST_F(LifeTableTest, AfterDamageTheLivesOfThisDaemonGoOnInTheirRows) {
+  const auto life = makeLife(0);  // without a journal it cannot be known again by its request
+  ASSERT_EQ(write(LifeRow{life, "app", ""}, eventOf(life, 1)), Result::kDone);
+  damage("power_event");
+  ASSERT_EQ(write(PowerRow{1.0, 28, "power", {}}), Result::kCorrupt);
+  ASSERT_TRUE(store_->beginAnew());
+  ASSERT_EQ(write(PowerRow{1.0, 28, "power", {}}), Result::kDone);
+  EXPECT_THAT(lives(), ElementsAre("1 7 open "));
+  damage("metric");
+  ASSERT_EQ(write(MetricRow{1.0, 7, "m"}), Result::kCorrupt);
+  ASSERT_TRUE(store_->beginAnew());
+  EXPECT_EQ(write(eventOf(life, 2), LifeRow{life, "app", "", endAt(4.0)}), Result::kDone);
+  EXPECT_THAT(lives(), ElementsAre("1 7 4.0 stopped"));
+  EXPECT_THAT(events(), ElementsAre(R"(1 {"n":1})", R"(1 {"n":2})"));
+}
+
+TEST_F(LifeTableTest, ALifeWhoseRowIsLostGetsItAgainWithTheSameIdentifier) {
+  const auto life = makeLife(0);
+  ASSERT_EQ(write(LifeRow{life, "app", ""}, eventOf(life, 1)), Result::kDone);
+  damage("session_row");
+  ASSERT_EQ(write(LifeRow{makeLife(0, 8), "", ""}), Result::kCorrupt);
+  ASSERT_TRUE(store_->beginAnew());
+  EXPECT_EQ(write(LifeRow{makeLife(0, 8), "", ""}, eventOf(life, 2)), Result::kDone);
+  EXPECT_THAT(rows("SELECT reporter_id, started_at, ending IS NULL FROM session ORDER BY id", 3),
+              ElementsAre("7 1.0 1", "8 1.0 1"));
+  EXPECT_THAT(events(), ElementsAre(R"(1 {"n":1})", R"(1 {"n":2})"));
+}
+
+// Its newest rows were lost without a trace, and their identifiers were given to others.
+TEST_F(LifeTableTest, ALifeWhoseIdentifierIsAnothersGetsANewRow) {
+  const auto life = makeLife(0);
+  ASSERT_EQ(write(LifeRow{life, "app", ""}), Result::kDone);
+  SqliteDatabase other;
+  ASSERT_TRUE(other.open(path(), SqliteDatabase::Mode::kReadWrite, std::chrono::seconds(30)));
+  ASSERT_TRUE(other.run("UPDATE session_row SET reporter_id = 9"));
+  other.close();
+  damage("power_event");
+  ASSERT_EQ(write(PowerRow{1.0, 28, "power", {}}), Result::kCorrupt);
+  ASSERT_TRUE(store_->beginAnew());
+  EXPECT_EQ(write(LifeRow{life, "app", "", endAt(4.0)}), Result::kDone);
+  EXPECT_THAT(lives(), ElementsAre("1 9 open ", "2 7 4.0 stopped"));
+}
+
+TEST_F(LifeTableTest, WhatACrashLeftOpenInADamagedFileIsInterrupted) {
+  ASSERT_EQ(write(LifeRow{makeLife(0), "app", ""}), Result::kDone);
+  store_.reset();
+  damage("age_clock");
+  crash();
+  ASSERT_EQ(write(), Result::kCorrupt);
+  ASSERT_TRUE(store_->beginAnew());
+  EXPECT_EQ(write(), Result::kDone);
+  EXPECT_THAT(lives(), ElementsAre("1 7 1.0 interrupted"));
 }
 
 TEST_F(LifeTableTest, TheEndOfALifeWhoseRowIsGoneMakesItAnew) {
