@@ -42,8 +42,8 @@ TEST(DaemonListingTest, ListsEndpointsAndTroublesAsTheyAreNow) {
   EXPECT_EQ(Value(endpointListing(status)).text(),
             R"([{"name":"http://a.example","waiting":1,"dropped":2,"hangs":3,"problem":"HTTP status 503"}])");
   EXPECT_EQ(Value(troubleListing(status)).text(),
-            R"([{"time":5,"category":"twrs","text":"own","times":2},)"
-            R"({"time":4,"category":"twrr","text":"theirs","times":1,"user":1000}])");
+            R"([{"time":5.0,"category":"twrs","text":"own","times":2},)"
+            R"({"time":4.0,"category":"twrr","text":"theirs","times":1,"user":1000}])");
 }
 
 }  // namespace
