@@ -13,48 +13,108 @@ std::string derived(std::string_view category, std::string_view type) {
   return sql.append("' AND source IS NOT 'client')");
 }
 
+// The entry of a payload when it has one of these types of JSON, else null.
+std::string entryOf(std::string_view payload, std::string_view key, std::string_view types,
+                    std::string_view sqlType) {
+  std::string sql = "CASE WHEN json_type(";
+  sql.append(payload).append(", '$.").append(key).append("') IN (").append(types);
+  sql.append(") THEN CAST(").append(payload).append(" ->> '").append(key).append("' AS ").append(sqlType);
+  return sql.append(") END");
+}
+
+// The bucketed volume, and numbers of some clients, are texts like "0.5".
+std::string numericEntryOf(std::string_view payload, std::string_view key, std::string_view types,
+                           std::string_view sqlType) {
+  const std::string text = std::string(payload) + " ->> '" + std::string(key) + "'";
+  std::string sql = "coalesce(" + entryOf(payload, key, types, sqlType) + ", CASE WHEN json_type(";
+  sql.append(payload).append(", '$.").append(key).append("') = 'text' AND ");
+  sql.append(text).append(" GLOB '[0-9]*' AND ");
+  sql.append(text).append(" NOT GLOB '*[^0-9.]*' AND ").append(text).append(" NOT GLOB '*.*.*' THEN CAST(");
+  return sql.append(text).append(" AS ").append(sqlType).append(") END)");
+}
+
+std::string numberIn(std::string_view payload, std::string_view key) {
+  return numericEntryOf(payload, key, "'integer', 'real'", "REAL");
+}
+
+std::string integerIn(std::string_view payload, std::string_view key) {
+  return numericEntryOf(payload, key, "'integer', 'real'", "INTEGER");
+}
+
+// Whether something is so: 1 or 0.
+std::string flagIn(std::string_view payload, std::string_view key) {
+  return numericEntryOf(payload, key, "'true', 'false', 'integer', 'real'", "INTEGER");
+}
+
+// Some clients name things by numbers.
+std::string textIn(std::string_view payload, std::string_view key) {
+  return entryOf(payload, key, "'text', 'integer', 'real'", "TEXT");
+}
+
+// A text that is null when it is `unknown`.
+std::string knownTextIn(std::string_view payload, std::string_view key, std::string_view unknown) {
+  std::string sql = "nullif(" + textIn(payload, key) + ", '";
+  return sql.append(unknown).append("')");
+}
+
+constexpr std::string_view kOfRow = "r.payload";
+
 // The rate at the beginning of a text like "48000 Hz, 2 ch, Float32".
 constexpr std::string_view kSampleRate =
     "CASE WHEN r.payload ->> 'session_selected_format' GLOB '[0-9]* Hz*'"
     " AND r.payload ->> 'session_selected_format' NOT GLOB '* * Hz*'"
     " THEN CAST(r.payload ->> 'session_selected_format' AS INTEGER) END";
 
-std::string stretchesOf(std::string_view category, std::string_view columns) {
+std::string stretchesOf(std::string_view category, const std::string& columns) {
   std::string sql = "SELECT r.id, r.session, nullif(s.service, 'unknown'), ";
-  sql.append(category == "Gather" ? "s.application"
-                                  : "nullif(r.payload ->> 'HostApplicationDisplayID', 'Unknown')");
+  sql += category == "Gather" ? "s.application" : knownTextIn(kOfRow, "HostApplicationDisplayID", "Unknown");
   sql.append(", r.began_at, r.ended_at, ").append(columns);
   sql.append(" FROM analytics_row AS r LEFT JOIN session_row AS s ON s.id = r.session WHERE ");
   return sql.append(derived(category, "Summary"));
 }
 
+std::string secondsAndDevice(std::string_view seconds) {
+  return "round(" + numberIn(kOfRow, seconds) + ", 3), " + knownTextIn(kOfRow, "active_devices", "unknown");
+}
+
+std::string formatColumns() {
+  return std::string(kSampleRate) + ", nullif(" + integerIn(kOfRow, "mChannelsPerFrame") + ", -1), " +
+         knownTextIn(kOfRow, "mFormatID", "unknown");
+}
+
 std::string volumeStretches() {
-  std::string columns =
-      "round(r.payload ->> 'play_seconds', 3), nullif(r.payload ->> 'active_devices', 'unknown'),"
-      " CAST(r.payload ->> 'QMSessionVolume' AS REAL),"
-      " CAST(nullif(r.payload ->> 'QMSessionVolumeBucketed', '') AS REAL), ";
-  columns.append(kSampleRate);
-  return stretchesOf("Volume", columns +
-                                   ", nullif(r.payload ->> 'mChannelsPerFrame', -1),"
-                                   " nullif(r.payload ->> 'mFormatID', 'unknown'),"
-                                   " r.payload ->> 'ringerstate', r.payload ->> 'spatializationEnabled'");
+  return stretchesOf("Volume", secondsAndDevice("play_seconds") + ", " + numberIn(kOfRow, "QMSessionVolume") +
+                                   ", " + numberIn(kOfRow, "QMSessionVolumeBucketed") + ", " +
+                                   formatColumns() + ", " + flagIn(kOfRow, "ringerstate") + ", " +
+                                   flagIn(kOfRow, "spatializationEnabled"));
 }
 
 std::string inputStretches() {
-  return stretchesOf(
-      "Input",
-      "round(r.payload ->> 'inputrunning_seconds', 3), nullif(r.payload ->> 'active_devices', 'unknown'),"
-      " nullif(r.payload ->> 'vp_config_operation_mode', 'unknown'),"
-      " nullif(r.payload ->> 'vp_config_input_port', 'unknown'), r.payload ->> 'vocoders'");
+  return stretchesOf("Input", secondsAndDevice("inputrunning_seconds") + ", " +
+                                  knownTextIn(kOfRow, "vp_config_operation_mode", "unknown") + ", " +
+                                  knownTextIn(kOfRow, "vp_config_input_port", "unknown") + ", " +
+                                  textIn(kOfRow, "vocoders"));
 }
 
 std::string gatherStretches() {
-  std::string columns =
-      "round(r.payload ->> 'play_seconds', 3), nullif(r.payload ->> 'active_devices', 'unknown'), ";
-  columns.append(kSampleRate);
-  return stretchesOf("Gather", columns +
-                                   ", nullif(r.payload ->> 'mChannelsPerFrame', -1),"
-                                   " nullif(r.payload ->> 'mFormatID', 'unknown')");
+  return stretchesOf("Gather", secondsAndDevice("play_seconds") + ", " + formatColumns());
+}
+
+std::string issues() {
+  return "SELECT r.id, r.recorded_at, r.session, nullif(s.service, 'unknown'), " +
+         knownTextIn(kOfRow, "HostApplicationDisplayID", "Unknown") +
+         ", CAST(r.payload ->> 'issue_type' AS TEXT), " + textIn(kOfRow, "node") + ", " +
+         numberIn(kOfRow, "any_channel_silence_seconds") + ", " +
+         integerIn(kOfRow, "smallest_buffer_frame_size") + ", " + integerIn(kOfRow, "io_cycle") +
+         " FROM analytics_row AS r LEFT JOIN session_row AS s ON s.id = r.session"
+         " WHERE instr(r.payload, '\"issue_type\":') > 0 AND r.payload ->> 'issue_type' IS NOT NULL";
+}
+
+std::string haptics() {
+  return "SELECT id, recorded_at, " + knownTextIn("payload", "ApplicationName", "Unknown") +
+         ", name, coalesce(" + numberIn("payload", "EngineOnDuration") + ", " +
+         numberIn("payload", "Haptic_Active_Hardware_Time_Seconds") + "), " + flagIn("payload", "Status") +
+         " FROM power_event WHERE event_group = 28";
 }
 
 // The entries of what the driver statistics of one form sent, with the parts of their keys:
@@ -108,7 +168,7 @@ std::string channelBuckets() {
          " CAST(substr(b.value, instr(b.value, ':') + 1) AS INTEGER) AS hits FROM " +
          channels("Histogram") +
          " AS c CROSS JOIN json_each('[' || replace(json_quote(substr(c.value, instr(c.value, '::') + 2)),"
-         " ';', '\",\"') || ']') AS b))";
+         " ';', '\",\"') || ']') AS b WHERE instr(c.value, '::') > 0 AND instr(b.value, ':') > 0))";
 }
 
 // "name:ON,transition:3,residency:200,duty_cycle:0.250000;name:OFF,..." becomes a row for each state.
@@ -123,7 +183,7 @@ std::string channelStates() {
          channels("State") +
          " AS c CROSS JOIN json_each('[' || replace(json_quote(substr(c.value, 6)), ';name:', '\",\"') || "
          "']')"
-         " AS b WHERE c.value <> '')";
+         " AS b WHERE instr(c.value, 'name:') = 1)";
 }
 
 constexpr StoreViewColumn kSession{"session", "integer", "the `session`"};
@@ -236,13 +296,7 @@ std::vector<StoreView> makeViews() {
         {"duration_seconds", "real", "for how long a channel was silent"},
         {"buffer_frames", "integer", "the smallest buffer, in frames"},
         {"io_cycle", "integer", "the cycle's number"}},
-       "SELECT r.id, r.recorded_at, r.session, nullif(s.service, 'unknown'),"
-       " nullif(r.payload ->> 'HostApplicationDisplayID', 'Unknown'), CAST(r.payload ->> 'issue_type' AS "
-       "TEXT),"
-       " r.payload ->> 'node', CAST(r.payload ->> 'any_channel_silence_seconds' AS REAL),"
-       " r.payload ->> 'smallest_buffer_frame_size', r.payload ->> 'io_cycle'"
-       " FROM analytics_row AS r LEFT JOIN session_row AS s ON s.id = r.session"
-       " WHERE instr(r.payload, '\"issue_type\":') > 0 AND r.payload ->> 'issue_type' IS NOT NULL"},
+       issues()},
       {"haptics",
        "a power event of the haptics engine",
        {{"id", "integer", "grows in the order of recording"},
@@ -251,9 +305,7 @@ std::vector<StoreView> makeViews() {
         {"name", "text", "the power event"},
         {"seconds", "real", "for how long the engine was on, in the unit of the application that reports it"},
         {"status", "integer", "1 when the engine came on, 0 when it went off"}},
-       "SELECT id, recorded_at, nullif(payload ->> 'ApplicationName', 'Unknown'), name,"
-       " CAST(coalesce(payload ->> 'EngineOnDuration', payload ->> 'Haptic_Active_Hardware_Time_Seconds')"
-       " AS REAL), payload ->> 'Status' FROM power_event WHERE event_group = 28"},
+       haptics()},
       {"channel_value",
        "what a driver's counter counted in a session",
        {kSession,
@@ -264,7 +316,8 @@ std::vector<StoreView> makeViews() {
         kChannelName,
         {"unit", "text", "null: simple counters report none"},
         {"value", "integer", "by how much it grew"}},
-       "SELECT session, at, driver, group_name, subgroup, name, CAST(NULL AS TEXT), value FROM " +
+       "SELECT session, at, driver, group_name, subgroup, name, CAST(NULL AS TEXT),"
+       " CASE WHEN typeof(value) IN ('integer', 'real') THEN CAST(value AS INTEGER) END FROM " +
            channels("Simple")},
       {"channel_bucket",
        "a bucket of a driver's histogram that had hits in a session",

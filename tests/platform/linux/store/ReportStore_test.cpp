@@ -1029,7 +1029,7 @@ TEST_F(BoundedReportStoreTest, KeepsAsManyRowsOfAKilobyteAsTheSmallestBoundHasRo
     EXPECT_LE(usedPart(), 1.0) << "after " << n;
   }
   expectTheNewestOf(3000);
-  EXPECT_GT(numbersLeft().size(), 500U);
+  EXPECT_GT(numbersLeft().size(), 450U);
 }
 
 TEST_F(BoundedReportStoreTest, DeletesByBytesWhereRowsOfAHundredLieBetweenRowsOfHalfAMegabyte) {

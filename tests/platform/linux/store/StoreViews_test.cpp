@@ -191,6 +191,92 @@ TEST_F(StoreViewsTest, AStateChannelBecomesARowForEachStateWhateverItsName) {
       ElementsAre("on \"1\" 3 200 0.25", "a,b;c 1 600 0.75"));
 }
 
+// Clients may send anything under these keys, and some of it reaches summaries.
+TEST_F(StoreViewsTest, AValueOfAnotherTypeIsNull) {
+  write(messageOf(kCategoryVolume, kTypeSummary,
+                  {{"play_seconds", "long"},
+                   {"QMSessionVolume", "loud"},
+                   {"QMSessionVolumeBucketed", "louder"},
+                   {"mChannelsPerFrame", "two"},
+                   {"mFormatID", ValueArray{1}},
+                   {"active_devices", ValueArray{"Speaker"}},
+                   {"ringerstate", "on"},
+                   {"spatializationEnabled", "yes"}}),
+        messageOf(kCategoryInput, kTypeSummary, {{"inputrunning_seconds", true}, {"vocoders", ValueArray{}}}),
+        messageOf(kCategoryGather, kTypeSummary, {{"play_seconds", "long"}, {"mChannelsPerFrame", "two"}}),
+        messageOf(kCategoryIo, kTypeError,
+                  {{"issue_type", "overload"},
+                   {"node", ValueArray{}},
+                   {"any_channel_silence_seconds", "long"},
+                   {"smallest_buffer_frame_size", "many"},
+                   {"io_cycle", "first"}},
+                  EventSource::kClient),
+        channels(kTypeSimple, {{"Drv_Simple_Frames", "many"}}),
+        channels(kTypeHistogram, {{"Drv_Histogram_Delay", 5}}), channels(kTypeState, {{"Drv_State_Mic", 5}}),
+        PowerRow{1.0, 28, "on", {{"EngineOnDuration", "long"}, {"Status", "on"}}});
+  EXPECT_THAT(rows("SELECT seconds, device, volume, volume_bucket, channels, format, ringer, spatial"
+                   " FROM volume_stretch",
+                   8),
+              ElementsAre("       "));
+  EXPECT_THAT(rows("SELECT seconds, vocoders FROM input_stretch", 2), ElementsAre(" "));
+  EXPECT_THAT(rows("SELECT seconds, channels FROM gather_stretch", 2), ElementsAre(" "));
+  EXPECT_THAT(rows("SELECT kind, node, duration_seconds, buffer_frames, io_cycle FROM issue", 5),
+              ElementsAre("overload    "));
+  EXPECT_THAT(rows("SELECT value FROM channel_value", 1), ElementsAre(""));
+  EXPECT_THAT(rows("SELECT * FROM channel_bucket", 1), IsEmpty());
+  EXPECT_THAT(rows("SELECT * FROM channel_state", 1), IsEmpty());
+  EXPECT_THAT(rows("SELECT seconds, status FROM haptics", 2), ElementsAre(" "));
+}
+
+TEST_F(StoreViewsTest, EveryColumnHasValuesOfItsType) {
+  const ValueMap summary{{"play_seconds", 2},
+                         {"inputrunning_seconds", 2},
+                         {"HostApplicationDisplayID", "app"},
+                         {"active_devices", "Speaker"},
+                         {"QMSessionVolume", 1},
+                         {"QMSessionVolumeBucketed", "1"},
+                         {"session_selected_format", "48000 Hz, 2 ch"},
+                         {"mChannelsPerFrame", "2"},
+                         {"mFormatID", "lpcm"},
+                         {"ringerstate", true},
+                         {"spatializationEnabled", 1},
+                         {"vp_config_operation_mode", "voice"},
+                         {"vp_config_input_port", 3},
+                         {"vocoders", "A:16000"}};
+  write(messageOf(kCategoryVolume, kTypeSummary, summary), messageOf(kCategoryInput, kTypeSummary, summary),
+        messageOf(kCategoryGather, kTypeSummary, summary),
+        messageOf(kCategoryIo, kTypeError,
+                  {{"issue_type", 1},
+                   {"node", 12},
+                   {"any_channel_silence_seconds", 1},
+                   {"smallest_buffer_frame_size", 256.0},
+                   {"io_cycle", 3.0},
+                   {"HostApplicationDisplayID", 4}}),
+        channels(kTypeSimple, {{"Drv_Rx_MCA_Simple_Frames", 1.0}}),
+        channels(kTypeHistogram,
+                 {{"Drv_Rx_MCA_Histogram_Delay", "count=4,lower=0,upper=30,min=3,max=25,unit=us::0-10:5"}}),
+        channels(kTypeState, {{"Drv_Rx_MCA_State_Mic", "name:on,transition:3,residency:200,duty_cycle:1;"}}),
+        PowerRow{1.0, 28, "on", {{"EngineOnDuration", 3}, {"Status", true}, {"ApplicationName", 1}}});
+  for (const StoreView& view : storeViews()) {
+    const std::string name(view.name);
+    EXPECT_NE(rows("SELECT count(*) FROM " + name, 1), std::vector<std::string>{"0"}) << name;
+    for (const StoreViewColumn& column : view.columns) {
+      EXPECT_THAT(rows("SELECT DISTINCT typeof(" + std::string(column.name) + ") FROM " + name, 1),
+                  testing::Each(testing::AnyOf("null", column.type)))
+          << name << "." << column.name;
+    }
+  }
+  // What is of the right type, or means the same, is there.
+  EXPECT_THAT(rows("SELECT seconds, device, volume, volume_bucket, sample_rate, channels, format, ringer,"
+                   " spatial FROM volume_stretch",
+                   9),
+              ElementsAre("2.0 Speaker 1.0 1.0 48000 2 lpcm 1 1"));
+  EXPECT_THAT(rows("SELECT mode, input_port, vocoders FROM input_stretch", 3),
+              ElementsAre("voice 3 A:16000"));
+  EXPECT_THAT(rows("SELECT kind, node, duration_seconds, buffer_frames, io_cycle FROM issue", 5),
+              ElementsAre("1 12 1.0 256 3"));
+}
+
 TEST_F(StoreViewsTest, AnEmptiedPayloadIsReadAsNothing) {
   write(messageOf(kCategoryVolume, kTypeSummary, {{"play_seconds", 2.5}}),
         channels(kTypeHistogram, {{"a", 1}}), PowerRow{1.0, 28, "power", {{"Status", true}}});
