@@ -153,7 +153,7 @@ std::string channels(std::string_view form) {
 }
 
 // "count=4,lower=0,upper=30,min=3,max=25,unit=us::0-10:5;20-30:7" becomes a row for each bucket. A bound may
-// be below 0.
+// be below 0. A histogram without a unit says "(null)".
 std::string channelBuckets() {
   return "SELECT session, at, driver, group_name, subgroup, name, unit,"
          " CAST(substr(bounds, 1, dash - 1) AS INTEGER), CAST(substr(bounds, dash + 1) AS INTEGER), hits "
@@ -162,8 +162,8 @@ std::string channelBuckets() {
          " instr(substr(bounds, 2), '-') + 1 AS dash FROM ("
          "SELECT c.session AS session, c.at AS at, c.driver AS driver, c.group_name AS group_name,"
          " c.subgroup AS subgroup, c.name AS name,"
-         " nullif(substr(c.value, instr(c.value, 'unit=') + 5,"
-         " instr(c.value, '::') - instr(c.value, 'unit=') - 5), '') AS unit,"
+         " nullif(nullif(substr(c.value, instr(c.value, 'unit=') + 5,"
+         " instr(c.value, '::') - instr(c.value, 'unit=') - 5), ''), '(null)') AS unit,"
          " substr(b.value, 1, instr(b.value, ':') - 1) AS bounds,"
          " CAST(substr(b.value, instr(b.value, ':') + 1) AS INTEGER) AS hits FROM " +
          channels("Histogram") +

@@ -172,7 +172,7 @@ TEST_F(StoreViewsTest, AHistogramBecomesARowForEachBucketAlsoBelowZero) {
   write(channels(kTypeHistogram,
                  {{"Drv_Tx_Histogram_Delay",
                    "count=4,lower=-10,upper=30,min=-7,max=25,unit=us::-10--5:2;-5-5:1;20-30:7"},
-                  {"Drv_Tx_Histogram_None", "count=4,lower=0,upper=30,min=3,max=25,unit=::0-10:5"}}));
+                  {"Drv_Tx_Histogram_None", "count=4,lower=0,upper=30,min=3,max=25,unit=(null)::0-10:5"}}));
   EXPECT_THAT(
       rows("SELECT name, coalesce(unit, '-'), lower, upper, hits FROM channel_bucket ORDER BY name, lower",
            5),
