@@ -218,11 +218,14 @@ std::vector<StoreView> makeViews() {
          "\"stopped\", \"replaced\" (by another session of its client under the same identifier), "
          "\"disconnected\" (its client had gone) or \"interrupted\" (the daemon had gone); null while it "
          "runs"},
-        {"messages", "integer", "received, without the summaries made at its end; null while it runs"},
-        {"unique_messages", "integer", "those that repeated none; null while it runs"},
-        {"redundant_messages", "integer", "those that repeated another one; null while it runs"},
-        {"active_seconds", "real", "the sum of the durations that it reported; null while it runs"},
-        {"overloads", "integer", "the number of overloads that it reported; null while it runs"}},
+        {"messages", "integer",
+         "received, without the summaries made at its end; null while it runs, and when it was interrupted "
+         "and "
+         "no journal was kept"},
+        {"unique_messages", "integer", "those that repeated none; null as `messages` is"},
+        {"redundant_messages", "integer", "those that repeated another one; null as `messages` is"},
+        {"active_seconds", "real", "the sum of the durations that it reported; null as `messages` is"},
+        {"overloads", "integer", "the number of overloads that it reported; null as `messages` is"}},
        "SELECT id, reporter_id, nullif(service, 'unknown'), application, process, user_id, started_at, "
        "ended_at, ending, messages,"
        " messages - redundant_messages, redundant_messages, active_seconds, overloads FROM session_row"},
