@@ -125,8 +125,8 @@ class StoreDatabase {
   std::uint64_t fileNumber_ = 0;
   // The file that was opened last, if it may still be the one of this number.
   std::optional<FileIdentity> opened_;
-  // The file that has, or will have, the place of a damaged one that this process wrote. The lives that it has
-  // are this process's, and have the identifiers that they had in the files from this number on.
+  // The file that has, or will have, the place of a damaged one that this process wrote. The lives that it
+  // has are this process's, and have the identifiers that they had in the files from this number on.
   std::optional<FileIdentity> saved_;
   std::uint64_t firstSavedNumber_ = 0;
   StoreBounds bounds_;

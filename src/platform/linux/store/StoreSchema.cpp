@@ -33,8 +33,8 @@ constexpr std::string_view kTables = R"(
     user_id INTEGER);
 )";
 
-// The lives of sessions. Their rows are written at the start, with each change of the configuration and at the
-// end, not with each message.
+// The lives of sessions. Their rows are written at the start, with each change of the configuration and at
+// the end, not with each message.
 constexpr std::string_view kSessionTable = R"(
   CREATE TABLE session_row (
     id INTEGER PRIMARY KEY, started_at REAL NOT NULL, request INTEGER, reporter_id INTEGER NOT NULL,

@@ -480,9 +480,9 @@ std::int64_t StoreTrimmer::deleteOldest(std::int64_t bytes) {
 }
 
 bool StoreTrimmer::deleteRows(const StoreTable& table, std::uint32_t user, const RowRange& rows) {
-  SqliteStatement statement = database_.prepare("DELETE FROM " + std::string(table.name) +
-                                                " WHERE id BETWEEN ?1 AND ?2 AND user_id IS ?3" +
-                                                conditionOf(table));
+  SqliteStatement statement =
+      database_.prepare("DELETE FROM " + std::string(table.name) +
+                        " WHERE id BETWEEN ?1 AND ?2 AND user_id IS ?3" + conditionOf(table));
   statement.bind(1, rows.first);
   statement.bind(2, rows.last);
   bindUser(statement, 3, user);

@@ -331,12 +331,11 @@ TEST_F(StoreSalvageTest, AFileOfVersionOneIsSavedAsOneOfThisVersion) {
 TEST_F(StoreSalvageTest, MessagesOfAFileOfVersionTwoHaveTheCategoryAndTypeOfTheirNames) {
   SqliteDatabase file;
   ASSERT_TRUE(file.open(path(), SqliteDatabase::Mode::kReadWrite, kLongEnough));
-  ASSERT_TRUE(
-      file.run(intoVersion2WithoutAges() +
-               "INSERT INTO analytics_name VALUES (50, 0, 'com.orvane.tonewerk.Volume.Summary'),"
-               " (50, 1, 'com.orvane.telephony.Volume.Summary');"
-               "INSERT INTO analytics_row (id, recorded_at, name_set, payload) VALUES"
-               " (5000, 1.5, 50, '{\"play_seconds\":2.5}')"))
+  ASSERT_TRUE(file.run(intoVersion2WithoutAges() +
+                       "INSERT INTO analytics_name VALUES (50, 0, 'com.orvane.tonewerk.Volume.Summary'),"
+                       " (50, 1, 'com.orvane.telephony.Volume.Summary');"
+                       "INSERT INTO analytics_row (id, recorded_at, name_set, payload) VALUES"
+                       " (5000, 1.5, 50, '{\"play_seconds\":2.5}')"))
       << file.problem();
   file.close();
   damagePage(pageOf("power_event"));
