@@ -171,6 +171,14 @@ TEST_F(StoreSalvageTest, OneDamagedPageLosesOnlyWhatIsOnIt) {
   for (const char* name : {"analytics_row", "power_event", "metric", "rtc_row", "rtc_session"}) {
     inner.push_back(pageOf(name));
   }
+  {  // without its list of tables a file has none
+    SqliteDatabase file;
+    ASSERT_TRUE(file.open(path(), SqliteDatabase::Mode::kReadOnly, kLongEnough));
+    for (const std::string& page :
+         rowsOf(file, "SELECT pageno FROM dbstat WHERE name IN ('sqlite_schema', 'sqlite_master')")) {
+      inner.push_back(std::stoll(page));
+    }
+  }
   ASSERT_GT(pages(), 150);
   constexpr std::size_t kMostOnAPage = 300;  // the smallest rows take more than 28 bytes
   for (std::int64_t page = 2; page <= pages(); page += 3) {
