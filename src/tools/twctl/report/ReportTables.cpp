@@ -24,15 +24,18 @@ constexpr const char* kShown =
     "main.session WHERE (?4 IS NULL OR id = ?4) AND (?1 IS NULL OR coalesce(ended_at, 1e18) >= ?1) AND "
     "(?2 IS NULL OR started_at <= ?2) AND (?3 IS NULL OR application GLOB ?3)";
 
-// A stretch without both times is not cut.
+// A stretch without both times is not cut. Without either, as those that an earlier version has stored, the
+// time of its recording says whether it is in the scope's time.
 std::string stretches(const char* table, const char* columns, const char* view) {
+  const std::string recorded = std::string("(SELECT at FROM main.event WHERE event.id = ") + view + ".id)";
   return std::string("CREATE TEMP TABLE ") + table + " AS SELECT " + columns +
          ", max(started_at, coalesce(?1, started_at)) AS started, min(ended_at, coalesce(?2, ended_at)) AS "
          "ended, max(0.0, seconds) * coalesce((min(ended_at, coalesce(?2, ended_at)) - max(started_at, "
          "coalesce(?1, started_at))) / nullif(ended_at - started_at, 0), 1.0) AS seconds FROM main." +
          view +
-         " WHERE (?4 IS NULL OR session = ?4) AND (?1 IS NULL OR coalesce(ended_at, started_at, ?1) >= ?1) "
-         "AND (?2 IS NULL OR coalesce(started_at, ?2) <= ?2) AND (?3 IS NULL OR application GLOB ?3)";
+         " WHERE (?4 IS NULL OR session = ?4) AND (?1 IS NULL OR coalesce(ended_at, started_at, " + recorded +
+         ") >= ?1) AND (?2 IS NULL OR coalesce(started_at, ended_at, " + recorded +
+         ") <= ?2) AND (?3 IS NULL OR application GLOB ?3)";
 }
 
 std::string trouble() {

@@ -101,6 +101,19 @@ TEST_F(ReportDataTest, CutsStretchesAtTheLimitsOfTime) {
   EXPECT_EQ(rows(data, "timeline", "played"), "[[1,1795133700.0,1795134600.0,0.5,\"Speaker\",0]]");
 }
 
+// Stores that an earlier version began have stretches without times. They counted in every range of time.
+TEST_F(ReportDataTest, AStretchWithoutTimesCountsWhereItWasRecorded) {
+  views_.run(
+      "INSERT INTO event (id, at) VALUES (1, 1795046400), (2, 1795132860); INSERT INTO volume_stretch (id, "
+      "application, seconds) VALUES (1, 'Old', 100000), (2, 'New', 60); INSERT INTO input_stretch (id, "
+      "application, seconds) VALUES (1, 'Old', 1000), (2, 'New', 30)");
+  EXPECT_EQ(at(read(), {"totals", "playSeconds"}), "100060");
+  const ValueMap newest = read({.since = kDay});
+  EXPECT_EQ(at(newest, {"totals", "playSeconds"}), "60");
+  EXPECT_EQ(at(newest, {"totals", "inputSeconds"}), "30");
+  EXPECT_EQ(at(read({.until = kDay}), {"totals", "playSeconds"}), "100000");
+}
+
 TEST_F(ReportDataTest, ChoosesApplicationsByPattern) {
   views_.played(1, "Melody", kDay, 600.0, "Speaker", 0.5);
   views_.played(2, "Phone", kDay, 60.0, "Speaker", 0.5);
