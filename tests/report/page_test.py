@@ -298,6 +298,15 @@ class PageTest(unittest.TestCase):
         laned = len({mark["session"] for mark in self.marks("session")})
         self.assertIn(f"{sessions - laned} sessions that played and overloaded less", self.text("#timeline .left-out"))
 
+    # Programs choose these times. One of them left the page empty.
+    def test_shows_the_rest_when_a_program_chose_an_impossible_time(self):
+        page = self.show("--days", "2", change="INSERT INTO volume_stretch (id, session, started_at, ended_at, seconds, volume) VALUES (1, 1, 1e14, 1e14, 1, 0.5), (2, 1, -1e14, 1e14, 1, 0.5)")
+        _, marks = self.assert_stretches_follow_the_scale()
+        self.assertEqual(len(marks), page.query("SELECT count(*) FROM volume_stretch")[0][0] - 2)
+        self.assertIn("2 stretches with a time that cannot be", self.text("#timeline .left-out"))
+        # The table of a session is also without these.
+        self.show("--days", "2", options=("--session", "1"), change="UPDATE session SET started_at = 1e14, ended_at = 1e14 WHERE id = 1")
+
     def test_fits_a_phone(self):
         self.show(width=390)
         self.assertEqual(self.browser.evaluate("document.documentElement.scrollWidth"), 390)

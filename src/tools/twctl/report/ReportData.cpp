@@ -137,7 +137,7 @@ ValueMap timeline(ReportTables& tables) {
               limit(ReportData::kMostHaptics) + ") ORDER BY at"));
   timeline.set(
       "leftOut",
-      tables.first("sessions:i stretches:i issues:i haptics:i",
+      tables.first("sessions:i stretches:i issues:i haptics:i misplaced:i",
                    "SELECT (SELECT count(*) FROM shown) - (SELECT count(*) FROM lane), max(0, (SELECT "
                    "count(*) FROM played WHERE session IN (SELECT id FROM lane)) - " +
                        std::to_string(ReportData::kMostStretches) +
@@ -145,7 +145,9 @@ ValueMap timeline(ReportTables& tables) {
                        "lane)) - " +
                        std::to_string(ReportData::kMostMarks) +
                        "), max(0, (SELECT count(*) FROM felt WHERE NOT leaked) - " +
-                       std::to_string(ReportData::kMostHaptics) + ")"));
+                       std::to_string(ReportData::kMostHaptics) +
+                       "), (SELECT count(*) FROM played WHERE misplaced) + (SELECT count(*) FROM heard WHERE "
+                       "misplaced)"));
   return timeline;
 }
 
@@ -352,7 +354,7 @@ std::string unknownSession(ReportTables& tables, std::int64_t session) {
 ReportData ReportData::read(const std::string& directory, const ReportScope& scope, double now) {
   ReportData report;
   ReportTables tables(scope);
-  if (!tables.open(directory)) {
+  if (!tables.open(directory, now)) {
     report.problem = tables.problem();
     return report;
   }

@@ -5,7 +5,9 @@
 #include <cmath>
 #include <cstddef>
 #include <filesystem>
+#include <iomanip>
 #include <limits>
+#include <sstream>
 #include <system_error>
 #include <utility>
 #include <vector>
@@ -25,16 +27,19 @@ constexpr const char* kShown =
     "(?2 IS NULL OR started_at <= ?2) AND (?3 IS NULL OR application GLOB ?3)";
 
 // A stretch without both times is not cut. Without either, as those that an earlier version has stored, the
-// time of its recording says whether it is in the scope's time.
-std::string stretches(const char* table, const char* columns, const char* view) {
-  const std::string recorded = std::string("(SELECT at FROM main.event WHERE event.id = ") + view + ".id)";
+// time of its recording says whether it is in the scope's time. `misplaced`: whether its times cannot be.
+std::string stretches(const char* table, const char* columns, const char* view,
+                      const std::string& misplaced) {
+  constexpr const char* kRecorded = "(SELECT at FROM main.event WHERE event.id = stretch.id)";
   return std::string("CREATE TEMP TABLE ") + table + " AS SELECT " + columns +
-         ", max(started_at, coalesce(?1, started_at)) AS started, min(ended_at, coalesce(?2, ended_at)) AS "
-         "ended, max(0.0, seconds) * coalesce((min(ended_at, coalesce(?2, ended_at)) - max(started_at, "
-         "coalesce(?1, started_at))) / nullif(ended_at - started_at, 0), 1.0) AS seconds FROM main." +
-         view +
-         " WHERE (?4 IS NULL OR session = ?4) AND (?1 IS NULL OR coalesce(ended_at, started_at, " + recorded +
-         ") >= ?1) AND (?2 IS NULL OR coalesce(started_at, ended_at, " + recorded +
+         ", misplaced, max(began, coalesce(?1, began)) AS started, min(finished, coalesce(?2, finished)) AS "
+         "ended, max(0.0, seconds) * coalesce((min(finished, coalesce(?2, finished)) - max(began, "
+         "coalesce(?1, began))) / nullif(finished - began, 0), 1.0) AS seconds FROM (SELECT *, CASE WHEN NOT "
+         "misplaced THEN started_at END AS began, CASE WHEN NOT misplaced THEN ended_at END AS finished FROM "
+         "(SELECT *, " +
+         misplaced + " AS misplaced FROM main." + view +
+         ")) AS stretch WHERE (?4 IS NULL OR session = ?4) AND (?1 IS NULL OR coalesce(finished, began, " +
+         kRecorded + ") >= ?1) AND (?2 IS NULL OR coalesce(began, finished, " + kRecorded +
          ") <= ?2) AND (?3 IS NULL OR application GLOB ?3)";
 }
 
@@ -84,12 +89,13 @@ Value cell(const SqliteStatement& row, int column, char kind) {
 
 }  // namespace
 
-bool ReportTables::open(const std::string& directory) {
+bool ReportTables::open(const std::string& directory, double now) {
   if (!openFile(directory) || !hasViews()) return false;
   run("BEGIN");
   run(kShown);
-  run(stretches("played", "session, application, device, volume, ringer", "volume_stretch"));
-  run(stretches("heard", "session, device, mode", "input_stretch"));
+  const std::string misplaced = misplacedBefore(now);
+  run(stretches("played", "session, application, device, volume, ringer", "volume_stretch", misplaced));
+  run(stretches("heard", "session, device, mode", "input_stretch", misplaced));
   run(trouble());
   run(felt());
   return problem_.empty();
@@ -165,6 +171,29 @@ bool ReportTables::openFile(const std::string& directory) {
   database_.close();
   if (std::filesystem::exists(path_ + "-wal", error)) return fail(problem);
   return database_.open(path_, SqliteDatabase::Mode::kImmutable, kPatience) || fail(database_.problem());
+}
+
+std::string ReportTables::misplacedBefore(double now) {
+  constexpr double kDay = 86'400.0;
+  constexpr std::int64_t kDecimals = 3;
+  // The daemon dates sessions and events. Events are in the order of their identifiers, so few of them are read.
+  const ValueMap times = first(
+      "oldest:d newest:d",
+      "SELECT min(t), max(t) FROM (SELECT min(started_at) AS t FROM main.session UNION ALL SELECT "
+      "max(coalesce(ended_at, started_at)) FROM main.session UNION ALL SELECT * FROM (SELECT at FROM "
+      "main.event ORDER BY id LIMIT 1) UNION ALL SELECT * FROM (SELECT at FROM main.event ORDER BY id DESC "
+      "LIMIT 1))");
+  const double oldest = times.number("oldest");
+  const double newest = times.number("newest");
+  const auto text = [](double time) {
+    std::ostringstream stream;
+    stream << std::fixed << std::setprecision(kDecimals) << time;
+    return stream.str();
+  };
+  const std::string least = text(oldest > 0.0 ? oldest - kDay : 0.0);
+  const std::string most = text((newest > now ? newest : now) + kDay);
+  return "coalesce(started_at NOT BETWEEN " + least + " AND " + most + ", 0) OR coalesce(ended_at NOT BETWEEN " +
+         least + " AND " + most + ", 0)";
 }
 
 bool ReportTables::hasViews() {

@@ -17,19 +17,23 @@ namespace tonewerk {
 // file when they are large. So a report sees one state of the store, and needs little memory.
 //
 //   shown    the sessions, with the columns of the view
-//   played   the volume stretches: session, application, device, volume, ringer, started, ended, seconds
-//   heard    the input stretches: session, device, mode, started, ended, seconds
+//   played   the volume stretches: session, application, device, volume, ringer, started, ended, seconds,
+//            misplaced (0, 1)
+//   heard    the input stretches: session, device, mode, started, ended, seconds, misplaced
 //   trouble  the issues: at, session, application, kind, node, duration_seconds, buffer_frames
 //   felt     the haptics: at, application, leaked (0, 1), seconds
 //
-// Stretches that are only partly in the scope's time are cut, and have this part of their seconds.
+// Stretches that are only partly in the scope's time are cut, and have this part of their seconds. Programs
+// choose the times of stretches. Those more than a day before the oldest record, or after now and the newest
+// one, cannot be: such a stretch is misplaced and has no times.
 class ReportTables {
  public:
   // `scope` outlives it.
   explicit ReportTables(const ReportScope& scope) : scope_(scope) {}
 
-  // Opens the store in `directory` and makes the tables. False on failure, with the reason in problem().
-  [[nodiscard]] bool open(const std::string& directory);
+  // Opens the store in `directory` and makes the tables. `now` in seconds since 1970. False on failure, with
+  // the reason in problem().
+  [[nodiscard]] bool open(const std::string& directory, double now);
 
   // Runs `sql`, in which ?1 to ?4 are the scope's since, until, application and session, or null. Calls
   // `take` for each row. After a failure this and later calls do nothing.
@@ -55,6 +59,8 @@ class ReportTables {
  private:
   [[nodiscard]] bool openFile(const std::string& directory);
   [[nodiscard]] bool hasViews();
+  // The condition on a stretch whose times cannot be.
+  std::string misplacedBefore(double now);
   bool fail(const std::string& problem);
 
   const ReportScope& scope_;

@@ -37,11 +37,13 @@
     return minutes % 60 ? `${Math.floor(minutes / 60)} h ${minutes % 60} min` : `${minutes / 60} h`;
   }
 
+  const LAST = 8.64e12 - 86400; // seconds: dates end a day later
+  const possible = (time) => Math.min(LAST, Math.max(-LAST, time)); // a program may have chosen it
   // The device's clock at a time, as a date whose UTC fields are those of that clock.
   function local(time) {
     let offset = data.offsets[0][1];
     for (const [from, seconds] of data.offsets) if (from <= time) offset = seconds;
-    return new Date((time + offset) * 1000);
+    return new Date((possible(time) + offset) * 1000);
   }
   const inUtc = (options) => new Intl.DateTimeFormat("en-GB", { ...options, timeZone: "UTC" });
   const dayText = inUtc({ day: "numeric", month: "short", year: "numeric" });
@@ -556,6 +558,7 @@
       if (out.stretches > 0) missing.push(`${many(out.stretches, "short stretch", "short stretches")}`);
       if (out.issues > 0) missing.push(`${many(out.issues, "short issue", "short issues")}`);
       if (out.haptics > 0) missing.push(`${many(out.haptics, "short haptic event", "short haptic events")}`);
+      if (out.misplaced > 0) missing.push(`${many(out.misplaced, "stretch", "stretches")} with a time that cannot be`);
       const text = missing.length ? `Left out of the lanes: ${missing.join(", ")}. All other numbers on the page count them.` : "";
       if (left.textContent !== text) left.textContent = text;
     };

@@ -114,6 +114,25 @@ TEST_F(ReportDataTest, AStretchWithoutTimesCountsWhereItWasRecorded) {
   EXPECT_EQ(at(read({.until = kDay}), {"totals", "playSeconds"}), "100000");
 }
 
+// A program says when its stretches began. One wrong time made the picture of everything else too narrow to see.
+TEST_F(ReportDataTest, AStretchWhoseTimeCannotBeCountsButIsInNoPicture) {
+  views_.played(1, "Melody", kDay, 600.0, "Speaker", 0.5);
+  views_.run(
+      "INSERT INTO volume_stretch (id, session, application, started_at, ended_at, seconds, volume) VALUES "
+      "(11, 1, 'Melody', 1e14, 1e14 + 1, 1, 1), (12, 1, 'Melody', 1.79e12, 1.79e12 + 2, 2, 1), (13, 1, "
+      "'Melody', 5, 9, 4, 1), (14, 1, 'Melody', -1e14, 1795132900, 8, 1), (15, 1, 'Melody', 1795132700, "
+      "1795132790, 16, 1); INSERT INTO input_stretch (id, session, started_at, ended_at, seconds) VALUES (16, "
+      "1, 1e14, 1e14 + 1, 1)");
+  const ValueMap data = read();
+  EXPECT_EQ(at(data, {"totals", "playSeconds"}), "631");
+  EXPECT_EQ(data.number("from"), kDay - 100.0);
+  EXPECT_EQ(data.number("until"), kDay + 600.0);
+  EXPECT_EQ(rows(data, "timeline", "played"),
+            R"([[1,1795132700.0,1795132790.0,1.0,null,null],[1,1795132800.0,1795133400.0,0.5,"Speaker",0]])");
+  EXPECT_EQ(rows(data, "timeline", "heard"), "[]");
+  EXPECT_EQ(at(data, {"timeline", "leftOut", "misplaced"}), "5");
+}
+
 TEST_F(ReportDataTest, ChoosesApplicationsByPattern) {
   views_.played(1, "Melody", kDay, 600.0, "Speaker", 0.5);
   views_.played(2, "Phone", kDay, 60.0, "Speaker", 0.5);
