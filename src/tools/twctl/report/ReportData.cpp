@@ -4,6 +4,7 @@
 #include <algorithm>
 #include <cmath>
 #include <limits>
+#include <map>
 #include <utility>
 #include <vector>
 
@@ -163,7 +164,7 @@ ValueArray hoursOf(ReportTables& tables, const LocalOffsets& offsets, const Span
   for (const auto& [begins, hour] : hours.hours()) {
     const double volume = hour.withVolume > 0.0 ? hour.volumeSeconds / hour.withVolume
                                                 : std::numeric_limits<double>::quiet_NaN();
-    rows.emplace_back(ValueArray{begins, rounded(hour.seconds), rounded(volume)});
+    rows.emplace_back(ValueArray{begins, rounded(hour.seconds), rounded(volume), hour.until});
   }
   return ValueArray(std::move(rows));
 }
@@ -212,6 +213,34 @@ ValueMap playing(ReportTables& tables) {
   return playing;
 }
 
+// Hours of the clock where there are few of them, else its days or weeks.
+std::int64_t stepOf(const Span& span) {
+  const double seconds = span.until - span.from;
+  if (seconds <= 3 * kDaySeconds) return LocalOffsets::kHour;
+  return seconds <= (ReportData::kMostSteps - 1) * kDaySeconds ? LocalOffsets::kDay : LocalOffsets::kWeek;
+}
+
+// The newest steps in which the audio overloaded, in their order.
+ValueArray overloadsOverTime(ReportTables& tables, const LocalOffsets& offsets, std::int64_t step) {
+  struct Counted {
+    std::int64_t until;
+    std::int64_t count = 0;
+  };
+  std::map<std::int64_t, Counted> steps;
+  tables.each("SELECT at FROM trouble WHERE kind = 'overload' AND at BETWEEN 0 AND 253402300799",
+              [&](const SqliteStatement& row) {
+                const LocalOffsets::Part part = offsets.partAt(row.number(0), step);
+                ++steps.try_emplace(part.from, Counted{part.until}).first->second.count;
+                if (steps.size() > ReportData::kMostSteps) steps.erase(steps.begin());
+              });
+  std::vector<Value> rows;
+  rows.reserve(steps.size());
+  for (const auto& [from, counted] : steps) {
+    rows.emplace_back(ValueArray{from, counted.until, counted.count});
+  }
+  return ValueArray(std::move(rows));
+}
+
 ValueMap issues(ReportTables& tables, const LocalOffsets& offsets, const Span& span) {
   ValueMap issues;
   issues.set("byKind", tables.list("kind:t count:i seconds:d",
@@ -228,16 +257,9 @@ ValueMap issues(ReportTables& tables, const LocalOffsets& offsets, const Span& s
                          "SELECT application, count(*), total(duration_seconds) FROM trouble WHERE kind = "
                          "'overload' GROUP BY 1 ORDER BY 2 DESC" +
                              limit(ReportData::kMostNames)));
-  // Hours of the clock where there are few of them, else its days.
-  const bool isShort = span.until - span.from <= 3 * kDaySeconds;
-  const std::string step = isShort ? "3600" : "86400";
-  const std::string offset = std::to_string(offsets.at(span.from));
-  issues.set("stepSeconds", isShort ? 3600 : 86400);
-  issues.set("overTime", tables.list("at:i count:i", "SELECT CAST((at + " + offset + ") / " + step +
-                                                         " AS INTEGER) * " + step + " - " + offset +
-                                                         ", count(*) FROM trouble WHERE kind "
-                                                         "= 'overload' GROUP BY 1 ORDER BY 1" +
-                                                         limit(4 * ReportData::kMostDays)));
+  const std::int64_t step = stepOf(span);
+  issues.set("stepSeconds", step);
+  issues.set("overTime", overloadsOverTime(tables, offsets, step));
   return issues;
 }
 

@@ -31,6 +31,7 @@ struct ReportData {
   static constexpr int kMostNames = 12;     // applications, devices
   static constexpr int kMostChannels = 12;  // histograms, and as many states
   static constexpr int kMostDays = 92;      // in the heat map
+  static constexpr int kMostSteps = 368;    // hours, days or weeks in the picture of overloads
   static constexpr int kMostRunning = 100;  // sessions that still run
   static constexpr int kMostSaid = 10'000;  // messages of them
 };

@@ -734,12 +734,15 @@
 
   function overloadsOverTime() {
     const step = data.issues.stepSeconds;
-    const rows = rowsOf(data.issues.overTime).map((row) => ({ ...row, from: local(row.at), until: new Date(+local(row.at) + step * 1000) }));
+    const name = { 3600: "hour", 86400: "day", 604800: "week" }[step];
+    const rows = data.issues.overTime.map(([begin, end, number]) => ({ at: begin, from: local(begin), until: local(end), count: number }));
     const domain = [new Date(Math.min(+local(data.from), ...rows.map(({ from }) => +from))), new Date(Math.max(+local(data.until), ...rows.map(({ until }) => +until)))];
+    const unseen = totals.overloads - sum(rows, (row) => row.count);
+    const newest = unseen > 0 ? ` These are the newest; ${many(unseen, "overload is", "overloads are")} older.` : "";
     return columnFigure({
-      id: "overloads", title: "Overloads over time", about: `How often the audio overloaded in each ${step === 3600 ? "hour" : "day"}.`, rows, value: (row) => row.count, colour: "var(--bad)", counts: true,
+      id: "overloads", title: "Overloads over time", about: `How often the audio overloaded in each ${name}.${newest}`, rows, value: (row) => row.count, colour: "var(--bad)", counts: true,
       x: (width) => ({ type: "utc", domain, ticks: Math.max(2, Math.round(width / 110)), tickFormat: tickText((domain[1] - domain[0]) / 1000) }), label: null, yLabel: "overloads",
-      columns: [[step === 3600 ? "Hour" : "Day", (row) => (step === 3600 ? atMinute(row.at) : dayText.format(row.from))], ["Overloads", (row) => count(row.count), true]], emptyText: "The audio did not overload in this time.",
+      columns: [[{ hour: "Hour", day: "Day", week: "Week from" }[name], (row) => (step === 3600 ? atMinute(row.at) : dayText.format(row.from))], ["Overloads", (row) => count(row.count), true]], emptyText: "The audio did not overload in this time.",
     });
   }
 

@@ -86,5 +86,39 @@ TEST_F(LocalHoursTest, FindsTheChangesOfTheZoneToTheSecond) {
   EXPECT_EQ(offsets.zone(), "CET");
 }
 
+TEST_F(LocalHoursTest, APartOfTheClockThatComesTwiceIsOnePart) {
+  setZone("Europe/Berlin");
+  constexpr std::int64_t kTwice = 1'792'886'400;  // 2026-10-25 02:00 CEST; an hour later it is 02:00 CET
+  const LocalOffsets offsets(kTwice - 86'400.0, kTwice + 86'400.0);
+  for (const double seconds : {0.0, 1800.0, 3600.0, 7199.0}) {
+    const LocalOffsets::Part part = offsets.partAt(kTwice + seconds, LocalOffsets::kHour);
+    EXPECT_EQ(part.from, kTwice) << seconds;
+    EXPECT_EQ(part.until, kTwice + 7200) << seconds;
+  }
+  EXPECT_EQ(offsets.partAt(kTwice - 1, LocalOffsets::kHour).until, kTwice);
+  EXPECT_EQ(offsets.partAt(kTwice + 7200, LocalOffsets::kHour).from, kTwice + 7200);
+  LocalHours hours(offsets, 0.0);
+  hours.add(kTwice - 1800.0, kTwice + 9000.0, 10'800.0, 0.5);
+  ASSERT_EQ(hours.hours().size(), 3U);
+  EXPECT_DOUBLE_EQ(hours.hours().at(kTwice).seconds, 7200.0);
+}
+
+TEST_F(LocalHoursTest, ADayBeginsWhenTheClockShowsIt) {
+  setZone("Africa/Cairo");  // 2026-04-24 has no time from 00:00 to 01:00
+  constexpr std::int64_t kChange = 1'776'981'600;
+  const LocalOffsets offsets(kChange - 172'800.0, kChange + 172'800.0);
+  const LocalOffsets::Part day = offsets.partAt(kChange + 40'000, LocalOffsets::kDay);
+  EXPECT_EQ(day.from, kChange);
+  EXPECT_EQ(day.until, kChange + 82'800);  // 23 hours
+  EXPECT_EQ(offsets.partAt(kChange - 1, LocalOffsets::kDay).until, kChange);
+}
+
+TEST_F(LocalHoursTest, AWeekBeginsOnMonday) {
+  setZone("UTC");
+  const LocalOffsets offsets(0.0, 1'795'132'800.0);
+  EXPECT_EQ(offsets.partAt(1'795'132'800, LocalOffsets::kWeek).from, 1'794'787'200);  // 2026-11-16
+  EXPECT_EQ(offsets.partAt(10.0, LocalOffsets::kWeek).from, -3 * 86'400);
+}
+
 }  // namespace
 }  // namespace tonewerk

@@ -83,7 +83,7 @@ TEST_F(ReportDataTest, SumsWhatWasPlayedByApplicationDeviceAndVolume) {
 TEST_F(ReportDataTest, WeightsTheVolumeOfAnHourBySeconds) {
   views_.played(1, "Melody", kDay + 100.0, 300.0, "Speaker", 1.0);
   views_.played(2, "Melody", kDay + 3500.0, 200.0, "Speaker", 0.5);
-  EXPECT_EQ(at(read(), {"hours"}), "[[1795132800,400.0,0.875],[1795136400,100.0,0.5]]");
+  EXPECT_EQ(at(read(), {"hours"}), "[[1795132800,400.0,0.875,1795136400],[1795136400,100.0,0.5,1795140000]]");
 }
 
 TEST_F(ReportDataTest, CutsStretchesAtTheLimitsOfTime) {
@@ -157,11 +157,41 @@ TEST_F(ReportDataTest, CountsOverloadsByBufferSizeAndDay) {
   views_.overloaded(2, kDay + 20'002.0, 128);
   const ValueMap data = read();
   EXPECT_EQ(rows(data, "issues", "byBuffer"), "[[64,2,1.0],[128,1,0.5]]");
-  EXPECT_EQ(rows(data, "issues", "overTime"), "[[1794700800,1],[1795132800,2]]");
+  EXPECT_EQ(at(data, {"issues", "overTime"}), "[[1794700800,1794787200,1],[1795132800,1795219200,2]]");
   EXPECT_EQ(at(data, {"issues", "stepSeconds"}), "86400");
   const ValueMap shortTime = read({.since = kDay});
-  EXPECT_EQ(rows(shortTime, "issues", "overTime"), "[[1795150800,2]]");
+  EXPECT_EQ(at(shortTime, {"issues", "overTime"}), "[[1795150800,1795154400,2]]");
   EXPECT_EQ(at(shortTime, {"issues", "stepSeconds"}), "3600");
+}
+
+// With one offset for all days, an overload just after midnight was counted for the day before.
+TEST_F(ReportDataTest, CountsOverloadsByTheDaysOfAClockThatChanges) {
+  setenv("TZ", "Europe/Berlin", 1);
+  tzset();
+  constexpr double kMidnight = 1'792'879'200.0;  // 2026-10-25 00:00 CEST, a day of 25 hours
+  views_.played(1, "Studio", kMidnight - 3 * 86'400.0, 60.0, "Speaker", 0.5);
+  views_.overloaded(1, kMidnight - 3 * 86'400.0 + 60.0, 64);
+  views_.overloaded(1, kMidnight + 60.0, 64);
+  views_.overloaded(1, kMidnight + 24.5 * 3600, 64);   // 23:30 CET
+  views_.overloaded(1, kMidnight + 25.01 * 3600, 64);  // 00:00:36 CET
+  const ValueMap data = read();
+  EXPECT_EQ(at(data, {"issues", "overTime"}),
+            "[[1792620000,1792706400,1],[1792879200,1792969200,2],[1792969200,1793055600,1]]");
+}
+
+TEST_F(ReportDataTest, CountsOverloadsByWeekOverYearsAndKeepsTheNewest) {
+  views_.run("BEGIN");
+  constexpr int kWeeks = ReportData::kMostSteps + 1;
+  views_.played(1, "Studio", kDay, 60.0, "Speaker", 0.5);
+  for (int i = 0; i < kWeeks; ++i) views_.overloaded(1, kDay - i * 604'800.0, 64);
+  views_.run("COMMIT");
+  const ValueMap data = read();
+  EXPECT_EQ(at(data, {"issues", "stepSeconds"}), "604800");
+  const ValueArray& steps = *data.find("issues")->asMap()->find("overTime")->asArray();
+  ASSERT_EQ(steps.size(), static_cast<std::size_t>(ReportData::kMostSteps));
+  const std::string newest = (*(steps.end() - 1)).text();
+  EXPECT_EQ(newest, "[1794787200,1795392000,1]");  // from Monday, 2026-11-16
+  EXPECT_EQ(at(data, {"totals", "overloads"}), std::to_string(kWeeks));
 }
 
 TEST_F(ReportDataTest, KeepsTheLongestAndTheMostOverloadedSessionsAndCountsTheOthers) {
