@@ -307,6 +307,16 @@ class PageTest(unittest.TestCase):
         # The table of a session is also without these.
         self.show("--days", "2", options=("--session", "1"), change="UPDATE session SET started_at = 1e14, ended_at = 1e14 WHERE id = 1")
 
+    # The daemon may have died with the session; then nobody knows.
+    def test_does_not_say_that_a_session_runs_when_no_daemon_answers(self):
+        page = self.show("--days", "2")
+        (running,) = page.query("SELECT id FROM session WHERE ended_at IS NULL")[0]
+        self.assertIn("1 without an end", self.text(".numbers"))
+        self.show("--days", "2", options=("--session", str(running)))
+        text = self.browser.evaluate("document.querySelector('main').textContent")
+        self.assertIn("no end recorded", text)
+        self.assertNotIn("still run", text)
+
     def test_fits_a_phone(self):
         self.show(width=390)
         self.assertEqual(self.browser.evaluate("document.documentElement.scrollWidth"), 390)

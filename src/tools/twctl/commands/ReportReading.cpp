@@ -6,6 +6,7 @@
 #include <chrono>
 #include <climits>
 #include <unistd.h>
+#include <utility>
 
 #include "tools/twctl/Tool.h"
 #include "tools/twctl/commands/RecordedDevice.h"
@@ -71,12 +72,15 @@ ValueMap reportedDevice(const Tool& tool) {
 ReportData readReport(const Tool& tool, const ReportScope& scope, const ValueMap& device) {
   const double now =
       std::chrono::duration<double>(std::chrono::system_clock::now().time_since_epoch()).count();
-  ReportData report = ReportData::read(tool.directories().state, scope, now);
+  ValueMap daemon = daemonHealth(tool);
+  ReportScope told = scope;
+  told.daemonAnswers = daemon.boolean("answers");
+  ReportData report = ReportData::read(tool.directories().state, told, now);
   if (!report.problem.empty()) return report;
   report.data.set("version", TONEWERK_VERSION);
   report.data.set("device", device);
   report.data.set("filter", filterOf(scope));
-  report.data.set("daemon", daemonHealth(tool));
+  report.data.set("daemon", std::move(daemon));
   return report;
 }
 

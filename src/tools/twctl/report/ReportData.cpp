@@ -37,6 +37,10 @@ Span spanOf(ReportTables& tables, const ReportScope& scope, double now) {
   const double from = times.number("from");
   const double until = times.number("until");
   Span span{from > 0.0 ? from : now, until > 0.0 ? until : now};
+  const bool isRunning =
+      scope.daemonAnswers &&
+      tables.first("running:i", "SELECT count(*) FROM shown WHERE ending IS NULL").integer("running") > 0;
+  if (scope.since || isRunning) span.until = std::max(span.until, now);
   if (scope.since) span.from = *scope.since;
   if (scope.until) span.until = std::min(*scope.until, std::max(span.until, now));
   span.until = std::max(span.until, span.from);

@@ -13,6 +13,7 @@ struct ReportScope {
   std::optional<double> until;             // seconds since 1970, inclusive
   std::optional<std::string> application;  // a pattern with *, ? and [...]
   std::optional<std::int64_t> session;     // the `id` of the view `session`
+  bool daemonAnswers = false;              // so a session without an end still runs
   bool hasRunning = false;                 // also what the sessions that still run have said of playback
 };
 

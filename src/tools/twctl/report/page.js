@@ -234,7 +234,7 @@
   function numbers() {
     const tile = (label, value, note, isBad) => el("li", { class: isBad ? "bad" : "" }, el("span", { class: "label" }, label), el("b", {}, value), el("span", {}, note));
     const tiles = [];
-    if (!session) tiles.push(tile("Sessions", count(totals.sessions), totals.running ? `${count(totals.running)} still ${totals.running === 1 ? "runs" : "run"}` : `of ${many(totals.applications, "application", "applications")}`));
+    if (!session) tiles.push(tile("Sessions", count(totals.sessions), totals.running ? `${count(totals.running)} ${daemonAnswers() ? `still ${totals.running === 1 ? "runs" : "run"}` : "without an end"}` : `of ${many(totals.applications, "application", "applications")}`));
     tiles.push(tile("Played", duration(totals.playSeconds), `on ${many(totals.devices, "device", "devices")}`));
     tiles.push(tile("Average volume", totals.averageVolume === null ? UNKNOWN : percent(totals.averageVolume), "weighted by time"));
     tiles.push(tile("Overloads", count(totals.overloads), overloadRate(), totals.overloads > 0));
@@ -281,6 +281,10 @@
   let isPrinting = false;
   const MOST_LANES = 24;
   const MOST_LANES_OF_APPLICATION = 4;
+
+  // Only a daemon that answers knows that a session without an end runs.
+  const daemonAnswers = () => (state ? state.answers : data.daemon?.answers === true);
+  const noEnd = () => (daemonAnswers() ? "still runs" : "no end recorded");
 
   // A session that the store does not have yet has no number.
   const nameOfSession = (one) => `${named(one?.application)}${typeof one?.id === "number" ? ` #${one.id}` : ""}`;
@@ -362,7 +366,7 @@
 
     const columns = [
       ["Session", (row) => (typeof row.id === "number" ? `#${row.id}` : "runs")], ["Application", (row) => named(row.application)], ["Service", (row) => named(row.service)],
-      ["Started", (row) => at(row.started)], ["Ended", (row) => (row.ended === null ? "still runs" : at(row.ended))],
+      ["Started", (row) => at(row.started)], ["Ended", (row) => (row.ended === null ? noEnd() : at(row.ended))],
       ["Ending", (row) => row.ending ?? ""], ["Played", (row) => duration(row.playSeconds), true], ["Overloads", (row) => count(row.overloads), true],
     ];
 
@@ -426,7 +430,7 @@
           (d) => ({ mark: "hour", from: d.from, seconds: d.seconds }))),
           charts.ruleY(lanes.map((_, i) => top + i * LANE), { stroke: "var(--line)" }),
           charts.rect(lives, tagged(lives, { x1: (d) => x(d.started), x2: (d) => wide(d.started, endOf(d)), y1: (d) => baseOf(d.id), y2: (d) => baseOf(d.id) + 2,
-            fill: "var(--quiet)", clip: true, title: (d) => `${nameOf(d)}, ${at(d.started)} to ${d.ended === null ? "now: it still runs" : at(d.ended)}` },
+            fill: "var(--quiet)", clip: true, title: (d) => `${nameOf(d)}, ${at(d.started)} to ${d.ended === null ? noEnd() : at(d.ended)}` },
           (d) => ({ mark: "session", session: d.id, started: d.started, ended: endOf(d) }))),
           charts.rect(runs, tagged(runs, { x1: (d) => x(d.started), x2: (d) => x(d.ended), y1: (d) => heightOf(d.session, d.volume), y2: (d) => baseOf(d.session),
             fill: (d) => colourOf(d.device), fillOpacity: (d) => (isNarrow(d) ? 0.9 : 0.3), clip: true,
@@ -837,7 +841,7 @@
   function sessionTables() {
     const facts = [
       ["Application", named(session.application)], ["Service", named(session.service)], ["Process", named(session.process)], ["User", session.user === null ? UNKNOWN : String(session.user)],
-      ["Reporter identifier", session.reporter === null ? UNKNOWN : String(session.reporter)], ["Started", at(session.started) || UNKNOWN], ["Ended", session.ended === null ? "it still runs" : `${at(session.ended)}, ${named(session.ending)}`],
+      ["Reporter identifier", session.reporter === null ? UNKNOWN : String(session.reporter)], ["Started", at(session.started) || UNKNOWN], ["Ended", session.ended === null ? noEnd() : `${at(session.ended)}, ${named(session.ending)}`],
       ["Open for", session.ended === null || session.started === null ? UNKNOWN : duration(session.ended - session.started)], ["Active for", session.activeSeconds === null ? UNKNOWN : duration(session.activeSeconds)],
       ["Messages", session.messages === null ? UNKNOWN : `${count(session.messages)}, of which ${count(session.redundantMessages)} said nothing new`],
     ];

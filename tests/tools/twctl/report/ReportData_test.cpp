@@ -298,13 +298,22 @@ TEST_F(ReportDataTest, SaysThatASessionIsUnknownAndWhichOnesHaveThisReporterIden
   EXPECT_TRUE(ReportData::read(directory_.path(), {.session = 99}, kNow).isUnknownSession);
 }
 
-TEST_F(ReportDataTest, ARunningSessionHasNoEndAndLastsUntilTheNewestReport) {
+TEST_F(ReportDataTest, ARunningSessionHasNoEndAndLastsUntilNowOrTheNewestReportOfADaemonThatHasGone) {
   views_.played(1, "Melody", kDay, 100.0, "Speaker", 0.5);
   views_.run("UPDATE session SET ended_at = NULL, ending = NULL, messages = NULL, overloads = NULL");
   const ValueMap data = read();
   EXPECT_EQ(at(data, {"totals", "running"}), "1");
   EXPECT_EQ(data.number("until"), kDay + 100.0);
   EXPECT_THAT(rows(data, "timeline", "lanes"), HasSubstr("1795132800.0,null,null,null,"));
+  EXPECT_EQ(read({.daemonAnswers = true}).number("until"), kNow);
+  EXPECT_EQ(read({.until = kDay + 500.0, .daemonAnswers = true}).number("until"), kDay + 500.0);
+}
+
+TEST_F(ReportDataTest, TheTimeSinceAMomentEndsNow) {
+  views_.played(1, "Melody", kDay, 100.0, "Speaker", 0.5);
+  EXPECT_EQ(read({.since = kDay}).number("until"), kNow);
+  EXPECT_EQ(read().number("until"), kDay + 100.0);
+  EXPECT_EQ(read({.daemonAnswers = true}).number("until"), kDay + 100.0);  // nothing runs
 }
 
 TEST_F(ReportDataTest, ValuesThatAreNotKnownAreNull) {
