@@ -37,6 +37,8 @@ CLASHES = """[...document.querySelectorAll('.picture svg')].flatMap((svg) => {
   return found;
 })"""
 
+NOTHING = "".join(f"DELETE FROM {table};" for table in ("session", "event", "volume_stretch", "input_stretch", "gather_stretch", "issue", "haptics", "channel_value", "channel_bucket", "channel_state"))
+
 
 class Page:
     """A store and the page of it."""
@@ -263,14 +265,21 @@ class PageTest(unittest.TestCase):
         self.assertTrue(any("Content Security Policy" in problem for problem in self.browser.problems), self.browser.problems)
 
     def test_says_in_words_what_an_empty_store_lacks(self):
-        empty = ";".join(f"DELETE FROM {table}" for table in ("session", "event", "volume_stretch", "input_stretch", "gather_stretch", "issue", "haptics", "channel_value", "channel_bucket", "channel_state"))
-        self.show("--days", "1", change=empty)
+        self.show("--days", "1", change=NOTHING)
         text = self.text()
         for sentence in ("Nothing was recorded in this time", "No session was open in this time.", "No application played in this time.", "The audio did not overload in this time.",
                          "No driver published counters in this time.", "The haptics engine was not used in this time.", "No daemon answered when this page was made"):
             self.assertIn(sentence, text)
         self.assertEqual(self.browser.evaluate("document.querySelectorAll('.picture').length"), 0)
         self.assertNotRegex(text, "NaN|undefined|null")
+
+    def test_is_not_empty_with_only_a_leak_inputs_or_counters(self):
+        for change in ("INSERT INTO haptics VALUES (1, 1795100000, NULL, 'LeakedHapticsSessionInfo', 60, NULL)",
+                       "INSERT INTO input_stretch (id, started_at, ended_at, seconds) VALUES (1, 1795100000, 1795100060, 60)",
+                       "INSERT INTO channel_value VALUES (1, 1795100000, 'amp', 'Tx', '', 'underruns', '', 3)"):
+            with self.subTest(change=change):
+                self.show("--days", "1", change=NOTHING + change)
+                self.assertNotIn("Nothing was recorded", self.text())
 
     def test_tells_times_by_the_devices_clock(self):
         page = self.show("--days", "1", zone="Asia/Kolkata")

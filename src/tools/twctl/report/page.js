@@ -156,7 +156,9 @@
     totals = data.totals;
     session = data.session;
     overloaded = rowsOf(data.issues.byBuffer);
-    isEmpty = totals.sessions === 0 && totals.playSeconds === 0 && totals.overloads + totals.otherIssues + totals.hapticsEvents === 0;
+    const { buckets, states, values } = data.drivers;
+    isEmpty = totals.sessions + totals.playSeconds + totals.inputSeconds + totals.overloads + totals.otherIssues + totals.hapticsEvents + totals.hapticsLeaks === 0
+      && buckets.rows.length + states.rows.length + values.rows.length === 0;
   }
   derive();
 
