@@ -206,14 +206,11 @@ ValueMap playing(ReportTables& tables) {
                           "SELECT application, device, sum(seconds) FROM played GROUP BY 1, 2 ORDER BY 3 "
                           "DESC" +
                               limit(ReportData::kMostNames * ReportData::kMostNames)));
-  playing.set(
-      "formats",
-      tables.list("device:t sampleRate:i channels:i format:t seconds:d",
-                  std::string("SELECT device, sample_rate, channels, format, sum(seconds) FROM "
-                              "main.gather_stretch WHERE (?1 IS NULL OR coalesce(ended_at, ?1) >= ?1) "
-                              "AND (?2 IS NULL OR coalesce(started_at, ?2) <= ?2) AND ") +
-                      ReportTables::kInSessions + "GROUP BY 1, 2, 3, 4 ORDER BY 5 DESC" +
-                      limit(ReportData::kMostNames)));
+  playing.set("formats", tables.list("device:t sampleRate:i channels:i format:t seconds:d",
+                                     "SELECT device, sample_rate, channels, format, sum(seconds) FROM played "
+                                     "WHERE coalesce(sample_rate, channels, format) IS NOT NULL GROUP BY 1, "
+                                     "2, 3, 4 ORDER BY 5 DESC" +
+                                         limit(ReportData::kMostNames)));
   return playing;
 }
 

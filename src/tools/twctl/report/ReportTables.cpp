@@ -94,7 +94,10 @@ bool ReportTables::open(const std::string& directory, double now) {
   run("BEGIN");
   run(kShown);
   const std::string misplaced = misplacedBefore(now);
-  run(stretches("played", "session, application, device, volume, ringer", "volume_stretch", misplaced));
+  run(stretches("played",
+                "session, application, device, CASE WHEN volume BETWEEN 0 AND 1 THEN volume END AS volume, "
+                "ringer, sample_rate, channels, format",
+                "volume_stretch", misplaced));
   run(stretches("heard", "session, device, mode", "input_stretch", misplaced));
   run(trouble());
   run(felt());

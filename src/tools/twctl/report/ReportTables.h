@@ -17,8 +17,8 @@ namespace tonewerk {
 // file when they are large. So a report sees one state of the store, and needs little memory.
 //
 //   shown    the sessions, with the columns of the view
-//   played   the volume stretches: session, application, device, volume, ringer, started, ended, seconds,
-//            misplaced (0, 1)
+//   played   the volume stretches: session, application, device, volume (null unless 0 to 1), ringer,
+//            sample_rate, channels, format, started, ended, seconds, misplaced (0, 1)
 //   heard    the input stretches: session, device, mode, started, ended, seconds, misplaced
 //   trouble  the issues: at, session, application, kind, node, duration_seconds, buffer_frames
 //   felt     the haptics: at, application, leaked (0, 1), seconds

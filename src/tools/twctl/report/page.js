@@ -816,6 +816,7 @@
 
   // ---- The rest
 
+  const MOST_FORMATS = 12;
   function otherTables() {
     const parts = [];
     const haptics = rowsOf(data.haptics);
@@ -824,7 +825,7 @@
     parts.push(wrap("Haptics by application", "For how long the haptics engine was on.", haptics.length
       ? table([["Application", (row) => named(row.application)], ["Events", (row) => count(row.count), true], ["Together", (row) => duration(row.seconds), true]], haptics)
       : empty("The haptics engine was not used in this time.")));
-    parts.push(wrap("Formats", "How long each format was in use.", formats.length
+    parts.push(wrap("Formats", `How long was played in each format${formats.length === MOST_FORMATS ? `; the ${MOST_FORMATS} that played longest` : ""}.`, formats.length
       ? table([["Device", (row) => named(row.device)], ["Format", (row) => [row.sampleRate ? `${count(row.sampleRate)} Hz` : null, row.channels ? many(row.channels, "channel", "channels") : null, row.format].filter(Boolean).join(", ") || UNKNOWN], ["Time", (row) => duration(row.seconds), true]], formats)
       : empty("No format was reported in this time.")));
     return el("div", { class: "pair" }, ...parts);

@@ -133,6 +133,25 @@ TEST_F(ReportDataTest, AStretchWhoseTimeCannotBeCountsButIsInNoPicture) {
   EXPECT_EQ(at(data, {"timeline", "leftOut", "misplaced"}), "5");
 }
 
+// Only shared group sessions had formats, with the seconds of the whole stretch.
+TEST_F(ReportDataTest, SumsTheFormatsOfWhatWasPlayedInTheLimitsOfTime) {
+  views_.played(1, "Melody", kDay, 3600.0, "Speaker", 0.5);
+  views_.played(2, "Melody", kDay + 4000.0, 10.0, "Speaker", 0.5);
+  views_.run("INSERT INTO volume_stretch (started_at, ended_at, seconds) VALUES (1795132800, 1795132801, 1)");
+  EXPECT_EQ(rows(read(), "playing", "formats"), R"([["Speaker",48000,2,"S32LE",3610.0]])");
+  EXPECT_EQ(rows(read({.since = kDay + 900.0, .until = kDay + 1800.0}), "playing", "formats"),
+            R"([["Speaker",48000,2,"S32LE",900.0]])");
+}
+
+TEST_F(ReportDataTest, AVolumeThatCannotBeIsNotKnown) {
+  views_.played(1, "Melody", kDay, 100.0, "Speaker", 0.5);
+  views_.played(2, "Melody", kDay, 100.0, "Speaker", 40.0);
+  views_.played(3, "Melody", kDay, 100.0, "Speaker", -1.0);
+  const ValueMap data = read();
+  EXPECT_EQ(at(data, {"totals", "averageVolume"}), "0.5");
+  EXPECT_EQ(rows(data, "playing", "byVolume"), "[[8,100.0]]");
+}
+
 TEST_F(ReportDataTest, ChoosesApplicationsByPattern) {
   views_.played(1, "Melody", kDay, 600.0, "Speaker", 0.5);
   views_.played(2, "Phone", kDay, 60.0, "Speaker", 0.5);
