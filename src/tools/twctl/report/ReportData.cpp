@@ -359,6 +359,18 @@ ValueMap runningPlayback(ReportTables& tables) {
           limit(ReportData::kMostSaid));
 }
 
+// Why a session that the store has is not in the scope; empty when the store does not have it.
+std::string outsideOfScope(ReportTables& tables, const ReportScope& scope) {
+  const ValueMap found = tables.first(
+      "id:i application:t fits:i",
+      "SELECT id, application, ?3 IS NULL OR coalesce(application GLOB ?3, 0) FROM main.session WHERE id = "
+      "?4");
+  if (found.empty()) return {};
+  const std::string session = tables.path() + ": session " + std::to_string(*scope.session);
+  if (found.integer("fits") == 1) return session + " was not open in the time of --since and --until";
+  return session + " is not of an application that " + *scope.application + " fits";
+}
+
 // "session 12 is not in ...", with the sessions that a reader may have meant.
 std::string unknownSession(ReportTables& tables, std::int64_t session) {
   std::string similar;
@@ -384,8 +396,10 @@ ReportData ReportData::read(const std::string& directory, const ReportScope& sco
   ValueMap& data = report.data;
   data.set("totals", totals(tables));
   if (scope.session && data.find("totals")->asMap()->integer("sessions") == 0) {
-    report.isUnknownSession = true;
-    report.problem = unknownSession(tables, *scope.session);
+    report.problem = outsideOfScope(tables, scope);
+    report.isUnknownSession = report.problem.empty();
+    if (report.isUnknownSession) report.problem = unknownSession(tables, *scope.session);
+    if (!tables.problem().empty()) report.problem = tables.problem();
     return report;
   }
   const Span span = spanOf(tables, scope, now);

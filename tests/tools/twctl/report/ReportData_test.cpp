@@ -317,6 +317,15 @@ TEST_F(ReportDataTest, SaysThatASessionIsUnknownAndWhichOnesHaveThisReporterIden
   EXPECT_TRUE(ReportData::read(directory_.path(), {.session = 99}, kNow).isUnknownSession);
 }
 
+TEST_F(ReportDataTest, SaysWhyASessionOfTheStoreIsNotInTheScope) {
+  views_.played(7, "Melody", kDay, 100.0, "Speaker", 0.5);
+  EXPECT_THAT(problem({.since = kDay + 200.0, .session = 7}),
+              testing::EndsWith(": session 7 was not open in the time of --since and --until"));
+  EXPECT_THAT(problem({.application = "Ph*", .session = 7}),
+              testing::EndsWith(": session 7 is not of an application that Ph* fits"));
+  EXPECT_FALSE(ReportData::read(directory_.path(), {.since = kDay + 200.0, .session = 7}, kNow).isUnknownSession);
+}
+
 TEST_F(ReportDataTest, ARunningSessionHasNoEndAndLastsUntilNowOrTheNewestReportOfADaemonThatHasGone) {
   views_.played(1, "Melody", kDay, 100.0, "Speaker", 0.5);
   views_.run("UPDATE session SET ended_at = NULL, ending = NULL, messages = NULL, overloads = NULL");
