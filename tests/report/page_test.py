@@ -326,6 +326,29 @@ class PageTest(unittest.TestCase):
         self.assertIn("no end recorded", text)
         self.assertNotIn("still run", text)
 
+    # Opens the page again with what another daemon says of itself.
+    def sentence_of(self, page, **daemon):
+        text = page.path.read_text()
+        changed = re.sub(r'"daemon":\{"answers":false,"reason":"[^"]*"\}', lambda _: '"daemon":' + json.dumps(daemon), text)
+        self.assertNotEqual(changed, text)
+        path = page.state / "changed.html"
+        path.write_text(changed)
+        self.browser.open(path)
+        self.assert_clean()
+        return self.text(".findings")
+
+    def test_says_of_the_daemon_only_what_it_has_told(self):
+        page = self.show("--days", "1")
+        told = {"answers": True, "refused": [], "sinks": [], "linesHeldBack": 0}
+        self.assertIn("it dropped and refused nothing.", self.sentence_of(page, tellsSinks=True, **told))
+        untrusted = self.sentence_of(page, tellsSinks=False, **told)
+        self.assertIn("it refused nothing of the user who made this page.", untrusted)
+        self.assertNotIn("dropped and refused nothing", untrusted)
+        told["linesHeldBack"] = 4
+        held = self.sentence_of(page, tellsSinks=True, **told)
+        self.assertIn("the daemon kept 4 lines out of its log.", held)
+        self.assertNotIn("refused requests", held)
+
     def test_fits_a_phone(self):
         self.show(width=390)
         self.assertEqual(self.browser.evaluate("document.documentElement.scrollWidth"), 390)

@@ -39,10 +39,17 @@ ValueArray refusals(const ValueMap& listing) {
                                     {"resource", resource.asMap()->text(kWatchKeyName)},
                                     {"times", resource.asMap()->integer(kWatchKeyRefused)}});
     }
-    const std::int64_t lines = account.asMap()->integer(kWatchKeyLinesHeldBack);
-    if (lines > 0) refused.emplace_back(ValueMap{{"user", user}, {"resource", "logLines"}, {"times", lines}});
   }
   return ValueArray(std::move(refused));
+}
+
+// The lines about all these users that the daemon kept out of its log.
+std::int64_t linesHeldBack(const ValueMap& listing) {
+  std::int64_t lines = 0;
+  for (const Value& account : arrayOf(listing, kWatchKeyAccounts)) {
+    if (account.asMap() != nullptr) lines += account.asMap()->integer(kWatchKeyLinesHeldBack);
+  }
+  return lines;
 }
 
 ValueArray sinksOf(const ValueMap& listing) {
@@ -69,7 +76,12 @@ ValueMap daemonHealth(const Tool& tool) {
   if (answer->error) return noAnswer(DaemonCalls::describe(requests::kWatchAccounts.name, *answer->error));
   const ValueMap* listing = answer->result ? answer->result->asMap() : nullptr;
   if (listing == nullptr) return noAnswer("its answer is not a listing");
-  return {{"answers", true}, {"refused", refusals(*listing)}, {"sinks", sinksOf(*listing)}};
+  // Users who are not trusted are told of their own account only, and of no sink.
+  return {{"answers", true},
+          {"tellsSinks", listing->contains(kWatchKeySinks)},
+          {"refused", refusals(*listing)},
+          {"linesHeldBack", linesHeldBack(*listing)},
+          {"sinks", sinksOf(*listing)}};
 }
 
 }  // namespace tonewerk

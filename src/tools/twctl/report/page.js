@@ -215,7 +215,7 @@
   }
 
   function daemonSentence() {
-    const { answers, reason, refused, sinks } = data.daemon;
+    const { answers, reason, refused, sinks, tellsSinks, linesHeldBack } = data.daemon;
     if (!answers) return `No daemon answered when this page was made (${reason}), so the page cannot say what was dropped or refused.`;
     const dropped = sum(sinks, (sink) => sink.dropped);
     const hanging = sinks.filter((sink) => sink.hangs > 0).map((sink) => sink.sink);
@@ -223,7 +223,10 @@
     if (dropped > 0) parts.push(`dropped ${many(dropped, "report", "reports")}`);
     if (refused.length > 0) parts.push(`refused requests ${many(sum(refused, (row) => row.times), "time", "times")}`);
     if (hanging.length > 0) parts.push(`has sinks that hang (${hanging.join(", ")})`);
-    return parts.length ? `Since it began, the daemon ${parts.join(", ")}.` : "The daemon answers. Since it began it dropped and refused nothing.";
+    if (linesHeldBack > 0) parts.push(`kept ${many(linesHeldBack, "line", "lines")} out of its log`);
+    const all = tellsSinks ? "" : " Only trusted users are told what it dropped, and what it refused to others.";
+    if (parts.length) return `Since it began, the daemon ${parts.join(", ")}.${all}`;
+    return tellsSinks ? "The daemon answers. Since it began it dropped and refused nothing." : `The daemon answers. Since it began it refused nothing of the user who made this page.${all}`;
   }
 
   function overloadRate() {
@@ -833,10 +836,10 @@
 
   function health() {
     const made = [el("p", {}, daemonSentence())];
-    const { answers, refused, sinks } = data.daemon;
+    const { answers, refused, sinks, tellsSinks } = data.daemon;
     if (!answers) return made;
     if (sinks.length) made.push(table([["Sink", (row) => row.sink], ["Waiting", (row) => count(row.waiting), true], ["Dropped", (row) => count(row.dropped), true], ["Hangs", (row) => (row.hangs > 0 ? `for ${duration(row.hangs)}` : "no")]], sinks));
-    else made.push(el("p", { class: "quiet" }, "The daemon tells only trusted users how its sinks stand."));
+    else made.push(el("p", { class: "quiet" }, tellsSinks ? "The daemon has no sinks." : "The daemon tells only trusted users how its sinks stand."));
     if (refused.length) made.push(el("p", {}, "What it refused:"), table([["User", (row) => String(row.user)], ["Of what there was too much", (row) => row.resource], ["Times", (row) => count(row.times), true]], refused));
     return made;
   }

@@ -111,9 +111,14 @@ TEST_F(ReportCommandTest, SaysWhatTheDaemonDroppedAndRefused) {
   EXPECT_EQ(run({"report", "--json"}), kDone);
   EXPECT_THAT(
       output(),
-      HasSubstr(R"("daemon":{"answers":true,"refused":[{"user":1000,"resource":"keptBytes","times":3},)"
-                R"({"user":1000,"resource":"logLines","times":4}],)"
-                R"("sinks":[{"sink":"store","waiting":17,"dropped":5,"hangs":2.5}]})"));
+      HasSubstr(R"("daemon":{"answers":true,"tellsSinks":true,"refused":[{"user":1000,"resource":"keptBytes",)"
+                R"("times":3}],"linesHeldBack":4,"sinks":[{"sink":"store","waiting":17,"dropped":5,"hangs":2.5}]})"));
+}
+
+TEST_F(ReportCommandTest, SaysThatAUserWhoIsNotTrustedIsToldOfNoSink) {
+  daemon().answer("watch.accounts", ValueMap{{"total", 1}, {"accounts", ValueArray{}}});
+  EXPECT_EQ(run({"report", "--json"}), kDone);
+  EXPECT_THAT(output(), HasSubstr(R"("tellsSinks":false,"refused":[],"linesHeldBack":0,"sinks":[])"));
 }
 
 TEST_F(ReportCommandTest, MakesThePageOfOneSession) {
