@@ -40,6 +40,12 @@ CLASHES = """[...document.querySelectorAll('.picture svg')].flatMap((svg) => {
 NOTHING = "".join(f"DELETE FROM {table};" for table in ("session", "event", "volume_stretch", "input_stretch", "gather_stretch", "issue", "haptics", "channel_value", "channel_bucket", "channel_state"))
 
 
+def played(session, begin, end, application="Melody", day=1795132800):
+    """The SQL that inserts a session that played all the time, from and until so many seconds after `day`."""
+    return (f"INSERT INTO session (id, application, started_at, ended_at, ending) VALUES ({session}, '{application}', {day + begin}, {day + end}, 'stopped');"
+            f"INSERT INTO volume_stretch (id, session, application, started_at, ended_at, seconds, device, volume) VALUES ({session}, {session}, '{application}', {day + begin}, {day + end}, {end - begin}, 'Speaker', 0.5);")
+
+
 class Page:
     """A store and the page of it."""
 
@@ -348,6 +354,13 @@ class PageTest(unittest.TestCase):
         held = self.sentence_of(page, tellsSinks=True, **told)
         self.assertIn("the daemon kept 4 lines out of its log.", held)
         self.assertNotIn("refused requests", held)
+
+    def test_tells_the_time_of_the_device_from_that_of_its_sessions(self):
+        self.show("--days", "1", change=NOTHING + played(1, 0, 3600) + played(2, 0, 3600) + played(3, 0, 3600))
+        self.assertIn("The sessions played 3 h added up, in 1 h of the device's time, ", self.text(".findings"))
+        self.assertIn("added up, in 1 h of time", self.text(".numbers"))
+        self.show("--days", "1", change=NOTHING + played(1, 0, 3600) + played(2, 3600, 7200))
+        self.assertIn("The device played 2 h, ", self.text(".findings"))
 
     def test_fits_a_phone(self):
         self.show(width=390)

@@ -64,6 +64,12 @@ ValueMap totals(ReportTables& tables) {
   totals.merge(tables.first("playSeconds:d averageVolume:d devices:i",
                             "SELECT coalesce(sum(seconds), 0.0), sum(seconds * volume) / nullif(sum(seconds) "
                             "FILTER (WHERE volume IS NOT NULL), 0), count(DISTINCT device) FROM played"));
+  // How long anything played at all, and how long other stretches played beside it.
+  totals.merge(tables.first(
+      "playingSeconds:d overlapSeconds:d",
+      "SELECT total(max(0.0, ended - max(started, coalesce(before, started)))), total(max(0.0, min(ended, "
+      "before) - started)) FROM (SELECT started, ended, max(ended) OVER (ORDER BY started ROWS BETWEEN "
+      "UNBOUNDED PRECEDING AND 1 PRECEDING) AS before FROM played WHERE started IS NOT NULL)"));
   totals.merge(tables.first("inputSeconds:d", "SELECT coalesce(sum(seconds), 0.0) FROM heard"));
   totals.merge(
       tables.first("overloads:i otherIssues:i overloadedSessions:i",

@@ -182,6 +182,9 @@
     return el("header", {}, el("h1", {}, title), el("p", { class: "quiet" }, `${time}${limits}${data.live ? "" : `Made on ${atMinute(data.generated)}.`}`));
   }
 
+  // Whether sessions played at the same time, so that the sum of their times is not that of the device.
+  const overlaps = () => !session && totals.overlapSeconds > totals.playSeconds / 100;
+
   // What a reader must know, in whole sentences.
   function findings() {
     const said = [];
@@ -192,7 +195,7 @@
       const shareOf = (row) => (row.seconds / totals.playSeconds > 0.995 ? "all of it" : `${percent(row.seconds / totals.playSeconds)} of it`);
       const time = duration(totals.playSeconds);
       if (session) said.push(`It played ${time}, ${shareOf(device)} on ${named(device.name)}.`);
-      else said.push(`The device played ${time}, ${shareOf(application)} for ${named(application.name)} and ${shareOf(device)} on ${named(device.name)}.`);
+      else said.push(`${overlaps() ? `The sessions played ${time} added up, in ${duration(totals.playingSeconds)} of the device's time` : `The device played ${time}`}, ${shareOf(application)} for ${named(application.name)} and ${shareOf(device)} on ${named(device.name)}.`);
     } else {
       said.push(data.live ? "The store has no playing time yet." : "Nothing was played.");
     }
@@ -240,7 +243,7 @@
     const tile = (label, value, note, isBad) => el("li", { class: isBad ? "bad" : "" }, el("span", { class: "label" }, label), el("b", {}, value), el("span", {}, note));
     const tiles = [];
     if (!session) tiles.push(tile("Sessions", count(totals.sessions), totals.running ? `${count(totals.running)} ${daemonAnswers() ? `still ${totals.running === 1 ? "runs" : "run"}` : "without an end"}` : `of ${many(totals.applications, "application", "applications")}`));
-    tiles.push(tile("Played", duration(totals.playSeconds), `on ${many(totals.devices, "device", "devices")}`));
+    tiles.push(tile("Played", duration(totals.playSeconds), overlaps() ? `added up, in ${duration(totals.playingSeconds)} of time` : `on ${many(totals.devices, "device", "devices")}`));
     tiles.push(tile("Average volume", totals.averageVolume === null ? UNKNOWN : percent(totals.averageVolume), "weighted by time"));
     tiles.push(tile("Overloads", count(totals.overloads), overloadRate(), totals.overloads > 0));
     tiles.push(tile("Input", duration(totals.inputSeconds), "microphones and other inputs"));
@@ -419,7 +422,7 @@
       }
       const heightOf = (id, volume) => baseOf(id) - VOLUME * Math.min(1, Math.max(0, volume ?? 0));
       const labels = lanes.map((lane, i) => ({ y: top + i * LANE + LABEL - 5, text: lane.label }));
-      if (hours.length) labels.unshift({ y: LABEL - 5, text: "All sessions: time played in each hour" });
+      if (hours.length) labels.unshift({ y: LABEL - 5, text: "All sessions: time played in each hour, added up" });
       if (haptics.length) labels.push({ y: hapticsTop + LABEL - 5, text: "Haptics" });
       const letters = Math.min(MOST_LETTERS, Math.floor(size / 7.4));
 
@@ -431,7 +434,7 @@
           charts.axisX({ ticks: Math.max(2, Math.round(size / 110)), tickSize: 4, tickFormat: tickText(until - from) }),
           charts.gridX({ ticks: Math.max(2, Math.round(size / 110)), stroke: "var(--line)", strokeOpacity: 1 }),
           charts.rect(visible, tagged(visible, { x1: (d) => x(d.from), x2: (d) => x(d.from + 3600), y1: (d) => LABEL + VOLUME - VOLUME * d.seconds / most,
-            y2: LABEL + VOLUME, fill: "var(--c8)", clip: true, title: (d) => `${atMinute(d.from)}: ${duration(d.seconds)} played in this hour` },
+            y2: LABEL + VOLUME, fill: "var(--c8)", clip: true, title: (d) => `${atMinute(d.from)}: ${duration(d.seconds)} played in this hour, added up over sessions` },
           (d) => ({ mark: "hour", from: d.from, seconds: d.seconds }))),
           charts.ruleY(lanes.map((_, i) => top + i * LANE), { stroke: "var(--line)" }),
           charts.rect(lives, tagged(lives, { x1: (d) => x(d.started), x2: (d) => wide(d.started, endOf(d)), y1: (d) => baseOf(d.id), y2: (d) => baseOf(d.id) + 2,
@@ -810,9 +813,10 @@
     const values = rowsOf(data.drivers.values);
     if (histograms.length + all.length + values.length === 0) return [empty("No driver published counters in this time.")];
     return [
+      session || histograms.length + all.length === 0 ? null : el("p", { class: "quiet" }, "Added up over sessions. What drivers count while two sessions are open counts for both."),
       Math.max(histograms.length, all.length) === MOST_CHANNELS ? el("p", { class: "quiet" }, `Shown are the ${MOST_CHANNELS} histograms, and as many states, that counted most.`) : null,
       el("div", { class: "pair" }, ...histograms, ...all),
-      values.length ? el("figure", {}, el("figcaption", {}, el("h3", {}, "Counters"), el("p", {}, "What drivers counted during sessions, added up.")),
+      values.length ? el("figure", {}, el("figcaption", {}, el("h3", {}, "Counters"), el("p", {}, session ? "What drivers counted during the session." : "What drivers counted during sessions, added up. What they count while two sessions are open counts for both.")),
         table([["Driver", (row) => named(row.driver)], ["Counter", channelTitle], ["Sum", (row) => `${count(row.sum)} ${row.unit ?? ""}`.trim(), true]], values)) : null,
     ].filter(Boolean);
   }

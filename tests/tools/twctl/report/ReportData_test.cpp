@@ -152,6 +152,19 @@ TEST_F(ReportDataTest, AVolumeThatCannotBeIsNotKnown) {
   EXPECT_EQ(rows(data, "playing", "byVolume"), "[[8,100.0]]");
 }
 
+// Three applications at the same time: the device played for 70 minutes, not for 3 hours.
+TEST_F(ReportDataTest, TellsTheTimeOfTheDeviceFromThatOfItsSessions) {
+  views_.played(1, "Melody", kDay, 3600.0, "Speaker", 0.5);
+  views_.played(2, "Game", kDay, 3600.0, "Speaker", 0.5);
+  views_.played(3, "Phone", kDay + 600.0, 3600.0, "Earpiece", 0.5);
+  views_.played(4, "Phone", kDay + 1200.0, 60.0, "Earpiece", 0.5);
+  views_.played(5, "Phone", kDay + 7200.0, 60.0, "Earpiece", 0.5);
+  const ValueMap data = read();
+  EXPECT_EQ(at(data, {"totals", "playSeconds"}), "10920");
+  EXPECT_EQ(at(data, {"totals", "playingSeconds"}), "4260");
+  EXPECT_EQ(at(data, {"totals", "overlapSeconds"}), "6660");
+}
+
 TEST_F(ReportDataTest, ChoosesApplicationsByPattern) {
   views_.played(1, "Melody", kDay, 600.0, "Speaker", 0.5);
   views_.played(2, "Phone", kDay, 60.0, "Speaker", 0.5);
