@@ -295,6 +295,18 @@ class PageTest(unittest.TestCase):
         self.assertIn("(IST)", self.text("header"))
         self.assertIn("12:15:00", self.browser.evaluate("document.querySelector('#timeline tbody').textContent"))
 
+    # On 25 October 2026 the clock of Berlin shows the hour from two o'clock twice.
+    def test_draws_the_hour_that_comes_twice_forwards_and_in_one_cell(self):
+        change = 1792890000  # 02:00 CET, an hour after 02:00 CEST
+        self.show("--days", "1", zone="Europe/Berlin", change=NOTHING + played(1, -7200, -1800, day=change) + played(2, -1800, 600, day=change) + played(3, 600, 7200, day=change))
+        _, marks = self.assert_stretches_follow_the_scale()
+        self.assertEqual(len(marks), 3)
+        cells = [(mark["_x"], mark["_y"]) for mark in self.marks("cell")]
+        self.assertEqual(len(set(cells)), len(cells))
+        self.assertEqual(len(cells), 3)  # from one, two and three o'clock
+        ticks = self.browser.evaluate("[...document.querySelectorAll('#timeline svg [aria-label=\"x-axis tick label\"] text')].map((text) => text.textContent)")
+        self.assertEqual(sum(tick.startswith("02:00") for tick in ticks), 2, ticks)
+
     def test_every_picture_has_a_name_a_description_and_a_table(self):
         self.show()
         problems = self.browser.evaluate("""[...document.querySelectorAll('.picture')].flatMap((picture) => {

@@ -52,12 +52,50 @@
   const secondText = inUtc({ day: "numeric", month: "short", year: "numeric", hour: "2-digit", minute: "2-digit", second: "2-digit", hourCycle: "h23" });
   const at = (time) => (time === null || time === undefined ? "" : secondText.format(local(time)));
   const atMinute = (time) => minuteText.format(local(time));
-  // Labels of a time axis over so many seconds. The first label, and that of a new day, also has the day.
-  function tickText(seconds) {
-    if (seconds > 4 * 86400) return undefined;
-    const clock = inUtc({ hour: "2-digit", minute: "2-digit", hourCycle: "h23", ...(seconds < 300 ? { second: "2-digit" } : {}) });
+  // The ticks of a time axis: where the device's clock shows round times, at most about `most` of them. The axis itself is in UTC,
+  // so that an hour that comes twice on the clock is there twice, and nothing is drawn backwards.
+  const STEP_SECONDS = [1, 2, 5, 10, 15, 30, 60, 120, 300, 600, 900, 1800, 3600, 7200, 10800, 21600, 43200, 86400, 172800, 259200, 345600, 604800, 1209600];
+  const STEP_MONTHS = [1, 2, 3, 6, 12, 24, 60, 120, 240, 1200, 6000, 12000, 60000, 1200000];
+  function ticksOf(from, until, most) {
+    const span = until - from;
+    const seconds = STEP_SECONDS.find((step) => span / step <= most);
+    const months = STEP_MONTHS.find((step) => span / (step * 30 * 86400) <= most) ?? 1200000;
+    const clocks = (begin, end) => {
+      const found = [];
+      const monday = seconds >= 604800 ? 4 * 86400 : 0;
+      if (seconds) for (let clock = Math.ceil((begin - monday) / seconds) * seconds + monday; clock < end; clock += seconds) found.push(clock);
+      else {
+        const first = new Date(begin * 1000);
+        for (let month = Math.floor((first.getUTCFullYear() * 12 + first.getUTCMonth()) / months) * months; ; month += months) {
+          const clock = Date.UTC(Math.floor(month / 12), month % 12, 1) / 1000;
+          if (!(clock < end)) break;
+          if (clock >= begin) found.push(clock);
+        }
+      }
+      return found;
+    };
+    const ticks = [];
+    data.offsets.forEach(([since, offset], i) => {
+      const begin = Math.max(from, i ? since : -Infinity);
+      const end = Math.min(until, data.offsets[i + 1]?.[0] ?? Infinity);
+      if (begin >= end) return;
+      for (const clock of clocks(begin + offset, end + offset)) {
+        const last = ticks.length ? ticks[ticks.length - 1] / 1000 : -Infinity;
+        if (clock - offset - last > (seconds ?? months * 30 * 86400) * 0.6) ticks.push(new Date((clock - offset) * 1000));
+      }
+    });
     const day = inUtc({ day: "numeric", month: "short" });
-    return (date, i) => (i === 0 || date % 86400000 === 0 ? `${clock.format(date)}\n${day.format(date)}` : clock.format(date));
+    const clock = inUtc({ hour: "2-digit", minute: "2-digit", hourCycle: "h23", ...(seconds < 60 ? { second: "2-digit" } : {}) });
+    const texts = ticks.map((tick, i) => {
+      const shown = local(tick / 1000);
+      if (seconds < 86400) return i === 0 || shown % 86400000 === 0 ? `${clock.format(shown)}\n${day.format(shown)}` : clock.format(shown);
+      const isNewYear = i === 0 || shown.getUTCFullYear() !== local(ticks[i - 1] / 1000).getUTCFullYear();
+      if (seconds) return isNewYear ? `${day.format(shown)}\n${shown.getUTCFullYear()}` : day.format(shown);
+      const month = inUtc({ month: "short" }).format(shown);
+      if (months >= 12) return String(shown.getUTCFullYear());
+      return isNewYear ? `${month}\n${shown.getUTCFullYear()}` : month;
+    });
+    return { ticks, tickFormat: (_, i) => texts[i] };
   }
   const between = (from, until) => `${atMinute(from)} to ${atMinute(until)}`;
 
@@ -340,7 +378,7 @@
       inputs = rowsOf(data.timeline.heard).map((row) => ({ ...row, ended: row.ended ?? row.started }));
       issues = rowsOf(data.timeline.issues);
       haptics = rowsOf(data.timeline.haptics);
-      hours = session || data.until - data.from < 4 * 3600 ? [] : data.hours.map(([from, seconds]) => ({ from, seconds }));
+      hours = session || data.until - data.from < 4 * 3600 ? [] : data.hours.map(([from, seconds, , until]) => ({ from, seconds, until }));
       byId = new Map(sessions.map((one) => [one.id, one]));
       const until = session && session.ended !== null ? data.until : Math.max(data.until, state ? nowAt() : 0);
       const from = Math.min(data.from, ...now.sessions.map(({ started }) => started), state ? until - LEAST_SHOWN : data.from);
@@ -397,7 +435,8 @@
       const hapticsTop = top + lanes.length * LANE;
       const height = hapticsTop + (haptics.length ? LABEL + 22 : 0);
       const most = Math.max(1, ...hours.map(({ seconds }) => seconds));
-      const x = (time) => local(time);
+      const x = (time) => new Date(possible(time) * 1000);
+      const axis = ticksOf(from, until, Math.max(2, Math.round(size / 90)));
       const wide = (started, ended) => x(Math.max(ended, started + least));
 
       const lives = sessions.filter((row) => hasLane(row) && inside(row.started, endOf(row)));
@@ -408,7 +447,7 @@
       const overloads = marks.filter((row) => row.kind === "overload");
       const others = marks.filter((row) => row.kind !== "overload");
       const felt = haptics.filter((row) => inside(row.at, row.at));
-      const visible = hours.filter((row) => inside(row.from, row.from + 3600));
+      const visible = hours.filter((row) => inside(row.from, row.until));
       const nameOf = (row) => nameOfSession(byId.get(row.session ?? row.id));
       // The line would hide the area of a stretch that is hardly wider.
       const isNarrow = (row) => (row.ended - row.started) / (until - from) * size < 3;
@@ -428,12 +467,12 @@
 
       const svg = plot({
         width, height: height + 34, marginLeft: margin.left, marginRight: margin.right, marginTop: 2, marginBottom: 28,
-        x: { type: "utc", domain: [local(from), local(until)], label: null },
+        x: { type: "utc", domain: [x(from), x(until)], label: null },
         y: { type: "linear", domain: [0, height], range: [2, 2 + height], axis: null },
         marks: [
-          charts.axisX({ ticks: Math.max(2, Math.round(size / 110)), tickSize: 4, tickFormat: tickText(until - from) }),
-          charts.gridX({ ticks: Math.max(2, Math.round(size / 110)), stroke: "var(--line)", strokeOpacity: 1 }),
-          charts.rect(visible, tagged(visible, { x1: (d) => x(d.from), x2: (d) => x(d.from + 3600), y1: (d) => LABEL + VOLUME - VOLUME * d.seconds / most,
+          charts.axisX({ ...axis, tickSize: 4 }),
+          charts.gridX({ ticks: axis.ticks, stroke: "var(--line)", strokeOpacity: 1 }),
+          charts.rect(visible, tagged(visible, { x1: (d) => x(d.from), x2: (d) => x(d.until), y1: (d) => LABEL + VOLUME - VOLUME * d.seconds / most,
             y2: LABEL + VOLUME, fill: "var(--c8)", clip: true, title: (d) => `${atMinute(d.from)}: ${duration(d.seconds)} played in this hour, added up over sessions` },
           (d) => ({ mark: "hour", from: d.from, seconds: d.seconds }))),
           charts.ruleY(lanes.map((_, i) => top + i * LANE), { stroke: "var(--line)" }),
@@ -747,14 +786,14 @@
   function overloadsOverTime() {
     const step = data.issues.stepSeconds;
     const name = { 3600: "hour", 86400: "day", 604800: "week" }[step];
-    const rows = data.issues.overTime.map(([begin, end, number]) => ({ at: begin, from: local(begin), until: local(end), count: number }));
-    const domain = [new Date(Math.min(+local(data.from), ...rows.map(({ from }) => +from))), new Date(Math.max(+local(data.until), ...rows.map(({ until }) => +until)))];
+    const rows = data.issues.overTime.map(([begin, end, number]) => ({ at: begin, from: new Date(begin * 1000), until: new Date(end * 1000), count: number }));
+    const domain = [new Date(Math.min(possible(data.from) * 1000, ...rows.map(({ from }) => +from))), new Date(Math.max(possible(data.until) * 1000, ...rows.map(({ until }) => +until)))];
     const unseen = totals.overloads - sum(rows, (row) => row.count);
     const newest = unseen > 0 ? ` These are the newest; ${many(unseen, "overload is", "overloads are")} older.` : "";
     return columnFigure({
       id: "overloads", title: "Overloads over time", about: `How often the audio overloaded in each ${name}.${newest}`, rows, value: (row) => row.count, colour: "var(--bad)", counts: true,
-      x: (width) => ({ type: "utc", domain, ticks: Math.max(2, Math.round(width / 110)), tickFormat: tickText((domain[1] - domain[0]) / 1000) }), label: null, yLabel: "overloads",
-      columns: [[{ hour: "Hour", day: "Day", week: "Week from" }[name], (row) => (step === 3600 ? atMinute(row.at) : dayText.format(row.from))], ["Overloads", (row) => count(row.count), true]], emptyText: "The audio did not overload in this time.",
+      x: (width) => ({ type: "utc", domain, ...ticksOf(domain[0] / 1000, domain[1] / 1000, Math.max(2, Math.round(width / 90))) }), label: null, yLabel: "overloads",
+      columns: [[{ hour: "Hour", day: "Day", week: "Week from" }[name], (row) => (step === 3600 ? atMinute(row.at) : dayText.format(local(row.at)))], ["Overloads", (row) => count(row.count), true]], emptyText: "The audio did not overload in this time.",
     });
   }
 
