@@ -270,7 +270,8 @@ ValueMap issues(ReportTables& tables, const LocalOffsets& offsets, const Span& s
   return issues;
 }
 
-// What a view of driver channels says for each of `keys`, of the channels that counted most.
+// What a view of driver channels says for each of `keys`, of the channels that counted most. Of a channel
+// with many, the rows with the same `part` are added up, so that the sums are those of all.
 struct ChannelQuery {
   const char* view;
   const char* unit;
@@ -278,6 +279,9 @@ struct ChannelQuery {
   const char* group;  // the columns' places: five for the channel, then the keys
   const char* sums;
   const char* weight;
+  const char* order;   // of a channel's rows, whose numbers `place` count from 0 to `places`
+  std::string part;    // an expression
+  std::string columns;  // of the rows of a part
 };
 
 ValueMap ofChannels(ReportTables& tables, const char* columns, const ChannelQuery& query) {
@@ -291,23 +295,35 @@ ValueMap ofChannels(ReportTables& tables, const char* columns, const ChannelQuer
                           query.weight +
                           ") AS weight FROM summed GROUP BY 1, 2, 3, 4, 5 ORDER BY weight DESC" +
                           limit(ReportData::kMostChannels) + ")";
-  return tables.list(columns, "WITH " + summed + ", " + top +
-                                  " SELECT summed.* FROM summed JOIN top USING (driver, grouped, subgroup, "
-                                  "name, unit) ORDER BY top.weight DESC, 1, 2, 3, 4, 5, 6" +
-                                  limit(64 * ReportData::kMostChannels));
+  const std::string placed = std::string(
+                                 "placed AS (SELECT summed.*, top.weight AS weight, row_number() OVER "
+                                 "(PARTITION BY driver, grouped, subgroup, name, unit ORDER BY ") +
+                             query.order +
+                             ") - 1 AS place, count(*) OVER (PARTITION BY driver, grouped, subgroup, name, "
+                             "unit) AS places FROM summed JOIN top USING (driver, grouped, subgroup, name, "
+                             "unit))";
+  return tables.list(columns, "WITH " + summed + ", " + top + ", " + placed +
+                                  " SELECT driver, grouped, subgroup, name, unit, " + query.columns +
+                                  " FROM placed GROUP BY driver, grouped, subgroup, name, unit, " +
+                                  query.part + " ORDER BY max(weight) DESC, 1, 2, 3, 4, 5, 6");
 }
 
 ValueMap drivers(ReportTables& tables) {
   ValueMap drivers;
+  const std::string most = std::to_string(ReportData::kMostParts);
   drivers.set("buckets",
               ofChannels(tables, "driver:t group:t subgroup:t name:t unit:t lower:i upper:i hits:i",
                          {"channel_bucket", "coalesce(unit, '')", "lower, upper", "1, 2, 3, 4, 5, 6, 7",
-                          "sum(hits) AS hits", "hits"}));
+                          "sum(hits) AS hits", "hits", "lower, upper",
+                          "place * min(places, " + most + ") / places", "min(lower), max(upper), sum(hits)"}));
+  const std::string state = "CASE WHEN places <= " + most + " OR place < " + most +
+                            " - 1 THEN state ELSE 'all other states' END";
   drivers.set(
       "states",
       ofChannels(tables, "driver:t group:t subgroup:t name:t unit:t state:t transitions:i residency:i",
                  {"channel_state", "''", "state", "1, 2, 3, 4, 5, 6",
-                  "sum(transitions) AS transitions, sum(residency) AS residency", "residency"}));
+                  "sum(transitions) AS transitions, sum(residency) AS residency", "residency",
+                  "residency DESC, state", state, state + ", sum(transitions), sum(residency)"}));
   drivers.set(
       "values",
       tables.list("driver:t group:t subgroup:t name:t unit:t sum:i",

@@ -30,6 +30,7 @@ struct ReportData {
   static constexpr int kMostRows = 250;     // in a table of one session
   static constexpr int kMostNames = 12;     // applications, devices
   static constexpr int kMostChannels = 12;  // histograms, and as many states
+  static constexpr int kMostParts = 64;     // buckets of a histogram, states of a channel
   static constexpr int kMostDays = 92;      // in the heat map
   static constexpr int kMostSteps = 368;    // hours, days or weeks in the picture of overloads
   static constexpr int kMostRunning = 100;  // sessions that still run

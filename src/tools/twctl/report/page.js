@@ -809,6 +809,8 @@
   // ---- Drivers
 
   const MOST_CHANNELS = 12;
+  const MOST_PARTS = 64;
+  const MOST_COUNTERS = 60;
   // The rows of each channel, in their order.
   function channelsOf(rows) {
     const channels = new Map();
@@ -826,7 +828,7 @@
     const [first] = rows;
     const bounds = (row) => (row.lower === null || row.upper === null ? UNKNOWN : `${count(row.lower)}–${count(row.upper)}`);
     return columnFigure({
-      title: channelTitle(first), about: `Driver ${named(first.driver)}${first.unit ? `, in ${first.unit}` : ""}, ${many(all, "count", "counts")}.`, rows, value: (row) => (all ? row.hits / all : 0), shares: true,
+      title: channelTitle(first), about: `Driver ${named(first.driver)}${first.unit ? `, in ${first.unit}` : ""}, ${many(all, "count", "counts")}.${rows.length === MOST_PARTS ? " Neighbouring buckets are added up." : ""}`, rows, value: (row) => (all ? row.hits / all : 0), shares: true,
       ordinal: bounds, x: (width) => ({ type: "band", domain: rows.map(bounds), padding: 0.15, tickRotate: rows.length > width / 55 ? -40 : 0 }), label: null, yLabel: "share", colour: "var(--c3)",
       columns: [[first.unit || "Range", bounds], ["Share", (row) => percent(all ? row.hits / all : 0), true], ["Counted", (row) => count(row.hits), true]],
     });
@@ -855,7 +857,7 @@
       session || histograms.length + all.length === 0 ? null : el("p", { class: "quiet" }, "Added up over sessions. What drivers count while two sessions are open counts for both."),
       Math.max(histograms.length, all.length) === MOST_CHANNELS ? el("p", { class: "quiet" }, `Shown are the ${MOST_CHANNELS} histograms, and as many states, that counted most.`) : null,
       el("div", { class: "pair" }, ...histograms, ...all),
-      values.length ? el("figure", {}, el("figcaption", {}, el("h3", {}, "Counters"), el("p", {}, session ? "What drivers counted during the session." : "What drivers counted during sessions, added up. What they count while two sessions are open counts for both.")),
+      values.length ? el("figure", {}, el("figcaption", {}, el("h3", {}, "Counters"), el("p", {}, session ? "What drivers counted during the session." : "What drivers counted during sessions, added up. What they count while two sessions are open counts for both.", values.length === MOST_COUNTERS ? ` These are the first ${MOST_COUNTERS}.` : "")),
         table([["Driver", (row) => named(row.driver)], ["Counter", channelTitle], ["Sum", (row) => `${count(row.sum)} ${row.unit ?? ""}`.trim(), true]], values)) : null,
     ].filter(Boolean);
   }

@@ -285,6 +285,28 @@ TEST_F(ReportDataTest, AddsUpWhatDriversCountedInAllSessions) {
   EXPECT_EQ(rows(read({.session = 1}), "drivers", "states"), R"([["amp","g","","power","","on",2,700]])");
 }
 
+// Rows above a limit were left out of the sums, and nobody was told.
+TEST_F(ReportDataTest, AddsUpNeighboursOfManyBucketsAndTheShortestOfManyStates) {
+  views_.played(1, "Melody", kDay, 100.0, "Speaker", 0.5);
+  views_.run(
+      "WITH RECURSIVE n(i) AS (SELECT 0 UNION ALL SELECT i + 1 FROM n WHERE i < 999) INSERT INTO "
+      "channel_bucket SELECT 1, 1795132900, 'amp', 'g', '', 'wake', 'ms', i * 10, i * 10 + 10, 3 FROM n; WITH "
+      "RECURSIVE n(i) AS (SELECT 0 UNION ALL SELECT i + 1 FROM n WHERE i < 999) INSERT INTO channel_state "
+      "SELECT 1, 1795132900, 'amp', 'g', '', 'power', 's' || i, 1, 1000 - i, 0 FROM n");
+  const ValueMap data = read();
+  const auto sum = [&](const char* list, std::size_t column) {
+    std::int64_t all = 0;
+    const ValueArray& found = *data.find("drivers")->asMap()->find(list)->asMap()->find("rows")->asArray();
+    EXPECT_EQ(found.size(), static_cast<std::size_t>(ReportData::kMostParts)) << list;
+    for (const Value& row : found) all += *(row.asArray()->begin() + column)->asInteger();
+    return all;
+  };
+  EXPECT_EQ(sum("buckets", 7), 3000);
+  EXPECT_EQ(sum("states", 7), 500'500);
+  EXPECT_THAT(rows(data, "drivers", "buckets"), testing::StartsWith(R"([["amp","g","","wake","ms",0,160,48],)"));
+  EXPECT_THAT(rows(data, "drivers", "states"), HasSubstr(R"("all other states",937,)"));
+}
+
 TEST_F(ReportDataTest, CountsLeaksOfTheHapticsEngineApartAndItsStatusNot) {
   views_.run(
       "INSERT INTO haptics VALUES (1, 1795132800, 'Game', 'Flumen_Haptics_EngineOnDuration', 2.0, NULL), (2, "
