@@ -323,7 +323,21 @@ class PageTest(unittest.TestCase):
         (sessions,) = page.query("SELECT count(*) FROM session")[0]
         self.assertGreater(sessions, 420)
         laned = len({mark["session"] for mark in self.marks("session")})
-        self.assertIn(f"{sessions - laned} sessions that played and overloaded less", self.text("#timeline .left-out"))
+        kept = self.browser.evaluate("JSON.parse(document.getElementById('data').textContent).timeline.lanes.rows.length")
+        text = self.text("#timeline .left-out")
+        self.assertIn(f"{sessions - kept} sessions besides the {kept} that played longest or overloaded most", text)
+        self.assertEqual(laned, kept)
+        self.choose_lanes("session")
+        self.assertIn(f"{kept - 24} sessions for which no lane is free (there are at most 24)", self.text("#timeline .left-out"))
+
+    def choose_lanes(self, kind):
+        self.browser.evaluate(f"(() => {{ const lanes = document.getElementById('lanes'); lanes.value = '{kind}'; lanes.dispatchEvent(new Event('change')); }})()")
+
+    # It was said to have played less than those shown.
+    def test_says_that_a_fifth_session_at_the_same_time_has_no_lane(self):
+        self.show("--days", "1", change=NOTHING + "".join(played(number, number, 3600 * number) for number in range(1, 6)))
+        self.choose_lanes("application")
+        self.assertIn("1 session for which no lane is free (there are at most 24, and 4 for one application)", self.text("#timeline .left-out"))
 
     # Programs choose these times. One of them left the page empty.
     def test_shows_the_rest_when_a_program_chose_an_impossible_time(self):

@@ -88,11 +88,11 @@ void chooseLanes(ReportTables& tables) {
   tables.run(
       "CREATE TEMP TABLE lane AS WITH sums AS (SELECT s.id, coalesce((SELECT sum(seconds) FROM played AS p "
       "WHERE p.session = s.id), 0) AS seconds, (SELECT count(*) FROM trouble AS t WHERE t.session = s.id AND "
-      "t.kind = 'overload') AS overloads FROM shown AS s) SELECT id FROM (SELECT id FROM sums ORDER BY "
-      "seconds "
+      "t.kind = 'overload') AS overloads FROM shown AS s), longest AS (SELECT id FROM sums ORDER BY seconds "
       "DESC, id DESC" +
       limit(ReportData::kLongestSessions) +
-      ") UNION SELECT id FROM (SELECT id FROM sums WHERE overloads > 0 ORDER BY overloads DESC, id DESC" +
+      ") SELECT id FROM longest UNION ALL SELECT id FROM (SELECT id FROM sums WHERE overloads > 0 AND id NOT "
+      "IN (SELECT id FROM longest) ORDER BY overloads DESC, id DESC" +
       limit(ReportData::kMostSessions - ReportData::kLongestSessions) + ")");
 }
 
@@ -148,12 +148,15 @@ ValueMap timeline(ReportTables& tables) {
               limit(ReportData::kMostHaptics) + ") ORDER BY at"));
   timeline.set(
       "leftOut",
-      tables.first("sessions:i stretches:i issues:i haptics:i misplaced:i",
+      tables.first("sessions:i stretches:i issues:i inputs:i haptics:i misplaced:i",
                    "SELECT (SELECT count(*) FROM shown) - (SELECT count(*) FROM lane), max(0, (SELECT "
-                   "count(*) FROM played WHERE session IN (SELECT id FROM lane)) - " +
+                   "count(*) FROM played WHERE started IS NOT NULL AND session IN (SELECT id FROM lane)) - " +
                        std::to_string(ReportData::kMostStretches) +
                        "), max(0, (SELECT count(*) FROM trouble WHERE session IN (SELECT id FROM "
                        "lane)) - " +
+                       std::to_string(ReportData::kMostMarks) +
+                       "), max(0, (SELECT count(*) FROM heard WHERE started IS NOT NULL AND session IN "
+                       "(SELECT id FROM lane)) - " +
                        std::to_string(ReportData::kMostMarks) +
                        "), max(0, (SELECT count(*) FROM felt WHERE NOT leaked) - " +
                        std::to_string(ReportData::kMostHaptics) +

@@ -604,10 +604,12 @@
       const out = data.timeline.leftOut;
       const missing = [];
       const laned = sum(lanesOf(sessions, mode), (lane) => lane.sessions.length);
-      const unseen = out.sessions + sessions.length - laned;
-      if (unseen > 0) missing.push(`${many(unseen, "session", "sessions")} that played and overloaded less than those shown`);
+      const unlaned = sessions.length - laned;
+      if (out.sessions > 0) missing.push(`${many(out.sessions, "session", "sessions")} besides the ${count(data.timeline.lanes.rows.length)} that played longest or overloaded most`);
+      if (unlaned > 0) missing.push(`${many(unlaned, "session", "sessions")} for which no lane is free (there are at most ${MOST_LANES}${mode === "session" ? "" : `, and ${MOST_LANES_OF_APPLICATION} for one application`})`);
       if (out.stretches > 0) missing.push(`${many(out.stretches, "short stretch", "short stretches")}`);
       if (out.issues > 0) missing.push(`${many(out.issues, "short issue", "short issues")}`);
+      if (out.inputs > 0) missing.push(`${many(out.inputs, "short input", "short inputs")}`);
       if (out.haptics > 0) missing.push(`${many(out.haptics, "short haptic event", "short haptic events")}`);
       if (out.misplaced > 0) missing.push(`${many(out.misplaced, "stretch", "stretches")} with a time that cannot be`);
       const text = missing.length ? `Left out of the lanes: ${missing.join(", ")}. All other numbers on the page count them.` : "";

@@ -243,6 +243,28 @@ TEST_F(ReportDataTest, KeepsTheLongestAndTheMostOverloadedSessionsAndCountsTheOt
   EXPECT_EQ(at(data, {"totals", "sessions"}), std::to_string(ReportData::kMostSessions + 50));
 }
 
+// Those that overloaded most were taken from all sessions, and were often among the longest ones already.
+TEST_F(ReportDataTest, KeepsTheMostOverloadedOfTheSessionsThatAreNotAmongTheLongest) {
+  views_.run("BEGIN");
+  for (int i = 1; i <= ReportData::kLongestSessions + 200; ++i) {
+    views_.played(i, "Melody", kDay + i, 10.0 + i, "Speaker", 0.5);
+    views_.overloaded(i, kDay + i, 64);
+    if (i > 200) views_.overloaded(i, kDay + i + 1.0, 64);  // the longest
+  }
+  views_.run("COMMIT");
+  EXPECT_EQ(at(read(), {"timeline", "leftOut", "sessions"}),
+            std::to_string(ReportData::kLongestSessions + 200 - ReportData::kMostSessions));
+}
+
+TEST_F(ReportDataTest, CountsTheInputsThatItLeavesOut) {
+  views_.played(1, "Melody", kDay, 3600.0, "Speaker", 0.5);
+  views_.run("WITH RECURSIVE n(i) AS (SELECT 1 UNION ALL SELECT i + 1 FROM n WHERE i < " +
+             std::to_string(ReportData::kMostMarks + 7) +
+             ") INSERT INTO input_stretch (id, session, started_at, ended_at, seconds) SELECT i, 1, 1795132800 "
+             "+ i, 1795132800.5 + i, 0.5 FROM n");
+  EXPECT_EQ(at(read(), {"timeline", "leftOut", "inputs"}), "7");
+}
+
 TEST_F(ReportDataTest, KeepsTheLongestStretchesOfEverySession) {
   const std::string stretches = "WITH RECURSIVE n(i) AS (SELECT 1 UNION ALL SELECT i + 1 FROM n WHERE i < " +
                                 std::to_string(ReportData::kMostStretches + 100) +
