@@ -273,7 +273,7 @@ class PageTest(unittest.TestCase):
     def test_says_in_words_what_an_empty_store_lacks(self):
         self.show("--days", "1", change=NOTHING)
         text = self.text()
-        for sentence in ("Nothing was recorded in this time", "No session was open in this time.", "No application played in this time.", "The audio did not overload in this time.",
+        for sentence in ("Nothing was recorded in this time", "No session was open in this time.", "No playback was recorded in this time.", "No overload was recorded in this time.",
                          "No driver published counters in this time.", "The haptics engine was not used in this time.", "No daemon answered when this page was made"):
             self.assertIn(sentence, text)
         self.assertEqual(self.browser.evaluate("document.querySelectorAll('.picture').length"), 0)
@@ -387,6 +387,20 @@ class PageTest(unittest.TestCase):
         self.assertIn("added up, in 1 h of time", self.text(".numbers"))
         self.show("--days", "1", change=NOTHING + played(1, 0, 3600) + played(2, 3600, 7200))
         self.assertIn("The device played 2 h, ", self.text(".findings"))
+
+    def test_says_no_more_than_the_store_knows(self):
+        nearly = played(1, 0, 86000) + played(2, 86000, 86100, application="Phone")
+        self.show("--days", "1", options=("--app", "M*"), change=NOTHING + nearly + "INSERT INTO issue (at, kind) VALUES (1795132800, 'overload');")
+        said = self.text(".findings")
+        self.assertIn("What fits “M*” played 23 h 53 min, all of it for Melody", said)
+        self.assertIn("No overload was recorded.", said)
+        self.show("--days", "1", options=("--since", "2026-11-20T00:00:00Z"), change=NOTHING + nearly + "UPDATE session SET messages = 4, redundant_messages = 1; INSERT INTO issue (at, kind) VALUES (1795132800, 'overload');")
+        said = self.text(".findings")
+        self.assertIn("nearly all of it for Melody", said)
+        self.assertIn("The audio overloaded 1 time.", said)
+        self.assertIn("25 % said nothing new; of whole sessions", self.text(".numbers"))
+        self.show("--days", "1", options=("--session", "1"), change=NOTHING + nearly)
+        self.assertEqual(self.browser.evaluate("[...document.querySelectorAll('h3')].find((title) => title.textContent === 'What was played').nextElementSibling.querySelector('tbody td:last-child').textContent"), "not known")
 
     def test_fits_a_phone(self):
         self.show(width=390)

@@ -229,20 +229,25 @@
     if (isEmpty) return [session ? "The store has nothing else about this session." : "Nothing was recorded in this time: no session, no playing time, no issue."];
     const [application] = rowsOf(data.playing.byApplication.top);
     const [device] = played;
+    const chosen = data.filter?.application;
     if (application && totals.playSeconds > 0) {
-      const shareOf = (row) => (row.seconds / totals.playSeconds > 0.995 ? "all of it" : `${percent(row.seconds / totals.playSeconds)} of it`);
+      const shareOf = (row) => {
+        const share = row.seconds / totals.playSeconds;
+        if (share <= 0.995) return `${percent(share)} of it`;
+        return share > 0.99999 ? "all of it" : "nearly all of it";
+      };
       const time = duration(totals.playSeconds);
       if (session) said.push(`It played ${time}, ${shareOf(device)} on ${named(device.name)}.`);
-      else said.push(`${overlaps() ? `The sessions played ${time} added up, in ${duration(totals.playingSeconds)} of the device's time` : `The device played ${time}`}, ${shareOf(application)} for ${named(application.name)} and ${shareOf(device)} on ${named(device.name)}.`);
+      else said.push(`${overlaps() ? `The sessions played ${time} added up, in ${duration(totals.playingSeconds)} of the device's time` : `${chosen ? `What fits “${chosen}”` : "The device"} played ${time}`}, ${shareOf(application)} for ${named(application.name)} and ${shareOf(device)} on ${named(device.name)}.`);
     } else {
-      said.push(data.live ? "The store has no playing time yet." : "Nothing was played.");
+      said.push(data.live ? "The store has no playing time yet." : "No playback was recorded.");
     }
     if (totals.overloads > 0) {
       const worst = [...overloaded].sort((a, b) => b.count - a.count)[0];
       const buffer = worst.frames === null ? "" : `; ${worst.count === totals.overloads ? "all" : percent(worst.count / totals.overloads)} of them with a buffer of ${count(worst.frames)} frames`;
-      said.push(`The audio overloaded ${many(totals.overloads, "time", "times")}${session ? "" : ` in ${many(totals.overloadedSessions, "session", "sessions")}`}${buffer}.`);
+      said.push(`The audio overloaded ${many(totals.overloads, "time", "times")}${session || totals.overloadedSessions === 0 ? "" : ` in ${many(totals.overloadedSessions, "session", "sessions")}`}${buffer}.`);
     } else {
-      said.push("The audio never overloaded.");
+      said.push("No overload was recorded.");
     }
     if (totals.otherIssues > 0) {
       const kinds = rowsOf(data.issues.byKind).filter(({ kind }) => kind !== "overload").map((row) => `${named(row.kind)} (${count(row.count)})`);
@@ -271,7 +276,7 @@
   }
 
   function overloadRate() {
-    if (totals.overloads === 0) return "none is good";
+    if (totals.overloads === 0) return "none was recorded";
     if (totals.playSeconds < 3600) return `in ${duration(totals.playSeconds)} played`;
     const rate = totals.overloads / totals.playSeconds * 3600;
     return `${rate < 10 ? rate.toPrecision(2) : count(rate)} an hour played`;
@@ -286,7 +291,7 @@
     tiles.push(tile("Overloads", count(totals.overloads), overloadRate(), totals.overloads > 0));
     tiles.push(tile("Input", duration(totals.inputSeconds), "microphones and other inputs"));
     tiles.push(tile("Haptics", duration(totals.hapticsSeconds), many(totals.hapticsEvents, "event", "events")));
-    if (totals.messages > 0) tiles.push(tile("Messages", count(totals.messages), `${percent(totals.redundantMessages / totals.messages)} said nothing new`));
+    if (totals.messages > 0) tiles.push(tile("Messages", count(totals.messages), `${percent(totals.redundantMessages / totals.messages)} said nothing new${data.filter?.since === undefined && data.filter?.until === undefined ? "" : "; of whole sessions"}`));
     return el("ul", { class: "numbers" }, ...tiles);
   }
 
@@ -664,7 +669,7 @@
       return { from, seconds, volume, hour: clock.getUTCHours(), day: new Date(Math.floor(clock / DAY) * DAY) };
     });
     const title = "Loudness by hour and day";
-    if (cells.length === 0) return figure({ id: "heat", title, emptyText: "Nothing was played in this time, so there is no loudness to show." });
+    if (cells.length === 0) return figure({ id: "heat", title, emptyText: "No playback was recorded in this time, so there is no loudness to show." });
     const known = cells.filter(({ volume }) => volume !== null);
     const days = [cells[0].day, new Date(+cells[cells.length - 1].day + DAY)];
     const several = (days[1] - days[0]) / DAY;
@@ -734,7 +739,7 @@
     return barFigure({
       id: "by-application", title: "Time by application", about: "How long each application played, and on which devices.", bars, rows, legendOf: deviceLegend(onDevices),
       columns: [["Application", (row) => named(row.name)], ["Played", (row) => duration(row.seconds), true], ["Average volume", (row) => percent(row.averageVolume), true], ["Sessions", (row) => count(row.sessions), true]],
-      emptyText: "No application played in this time.",
+      emptyText: "No playback was recorded in this time.",
     });
   }
 
@@ -745,7 +750,7 @@
     return barFigure({
       id: "by-device", title: "Time by device", about: "How long each device played.", bars, rows: played,
       columns: [["Device", (row) => named(row.name)], ["Played", (row) => duration(row.seconds), true], ["Average volume", (row) => percent(row.averageVolume), true], ["Sessions", (row) => count(row.sessions), true]],
-      emptyText: "No device played in this time.",
+      emptyText: "No playback was recorded in this time.",
     });
   }
 
@@ -795,7 +800,7 @@
     return columnFigure({
       id: "overloads", title: "Overloads over time", about: `How often the audio overloaded in each ${name}.${newest}`, rows, value: (row) => row.count, colour: "var(--bad)", counts: true,
       x: (width) => ({ type: "utc", domain, ...ticksOf(domain[0] / 1000, domain[1] / 1000, Math.max(2, Math.round(width / 90))) }), label: null, yLabel: "overloads",
-      columns: [[{ hour: "Hour", day: "Day", week: "Week from" }[name], (row) => (step === 3600 ? atMinute(row.at) : dayText.format(local(row.at)))], ["Overloads", (row) => count(row.count), true]], emptyText: "The audio did not overload in this time.",
+      columns: [[{ hour: "Hour", day: "Day", week: "Week from" }[name], (row) => (step === 3600 ? atMinute(row.at) : dayText.format(local(row.at)))], ["Overloads", (row) => count(row.count), true]], emptyText: "No overload was recorded in this time.",
     });
   }
 
@@ -804,7 +809,7 @@
       id: "buffers", title: "Overloads by buffer size", about: "Smaller buffers give shorter delays and less time to fill them.", rows: overloaded, value: (row) => row.count, colour: "var(--bad)", counts: true,
       ordinal: (row) => (row.frames === null ? UNKNOWN : count(row.frames)), x: () => ({ type: "band", domain: overloaded.map((row) => (row.frames === null ? UNKNOWN : count(row.frames))), padding: 0.3 }), label: "frames in the buffer", yLabel: "overloads",
       columns: [["Frames", (row) => (row.frames === null ? UNKNOWN : count(row.frames)), true], ["Overloads", (row) => count(row.count), true], ["Together", (row) => duration(row.seconds), true]],
-      emptyText: "The audio did not overload in this time.",
+      emptyText: "No overload was recorded in this time.",
     });
   }
 
@@ -907,9 +912,9 @@
     return [
       el("h2", {}, "The session"), table([["Fact", (row) => row[0]], ["Value", (row) => row[1]]], facts),
       el("h2", {}, "What it did"),
-      ...part("What was played", stretches, [["From", (row) => at(row.started)], ["For", (row) => duration(row.seconds), true], ["Device", (row) => named(row.device)], ["Volume", (row) => percent(row.volume), true], ["Ringer", (row) => (row.ringer === 1 ? "on" : "off")]], "It played nothing."),
-      ...part("Inputs", inputs, [["From", (row) => at(row.started)], ["For", (row) => duration(row.seconds), true], ["Device", (row) => named(row.device)], ["Mode", (row) => named(row.mode)]], "It used no input."),
-      ...part("Issues", issues, [["Time", (row) => at(row.at)], ["Kind", (row) => named(row.kind)], ["Where", (row) => row.node ?? ""], ["Lasted", (row) => duration(row.seconds), true], ["Buffer, in frames", (row) => count(row.frames), true]], "It had no issue."),
+      ...part("What was played", stretches, [["From", (row) => at(row.started)], ["For", (row) => duration(row.seconds), true], ["Device", (row) => named(row.device)], ["Volume", (row) => percent(row.volume), true], ["Ringer", (row) => (row.ringer === null ? UNKNOWN : row.ringer === 1 ? "on" : "off")]], "No playback of it was recorded."),
+      ...part("Inputs", inputs, [["From", (row) => at(row.started)], ["For", (row) => duration(row.seconds), true], ["Device", (row) => named(row.device)], ["Mode", (row) => named(row.mode)]], "No input of it was recorded."),
+      ...part("Issues", issues, [["Time", (row) => at(row.at)], ["Kind", (row) => named(row.kind)], ["Where", (row) => row.node ?? ""], ["Lasted", (row) => duration(row.seconds), true], ["Buffer, in frames", (row) => count(row.frames), true]], "No issue of it was recorded."),
       ...part("Messages by kind", kinds, [["Category", (row) => named(row.category)], ["Type", (row) => named(row.type)], ["From", (row) => (row.source === "derived" ? "the daemon" : "the client")], ["Messages", (row) => count(row.count), true], ["First", (row) => at(row.first)], ["Last", (row) => at(row.last)]], "The store has none of its messages.", 60),
     ];
   }
