@@ -402,6 +402,11 @@ class PageTest(unittest.TestCase):
         self.show("--days", "1", options=("--session", "1"), change=NOTHING + nearly)
         self.assertEqual(self.browser.evaluate("[...document.querySelectorAll('h3')].find((title) => title.textContent === 'What was played').nextElementSibling.querySelector('tbody td:last-child').textContent"), "not known")
 
+    def test_says_that_the_unit_of_haptics_is_an_assumption(self):
+        self.show("--days", "2")
+        self.assertIn("Applications report it without a unit; the page takes it for seconds.", self.text())
+        self.assertRegex(self.text(".numbers"), r"events, taken as seconds")
+
     def test_fits_a_phone(self):
         self.show(width=390)
         self.assertEqual(self.browser.evaluate("document.documentElement.scrollWidth"), 390)

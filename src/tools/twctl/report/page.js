@@ -290,7 +290,7 @@
     tiles.push(tile("Average volume", totals.averageVolume === null ? UNKNOWN : percent(totals.averageVolume), "weighted by time"));
     tiles.push(tile("Overloads", count(totals.overloads), overloadRate(), totals.overloads > 0));
     tiles.push(tile("Input", duration(totals.inputSeconds), "microphones and other inputs"));
-    tiles.push(tile("Haptics", duration(totals.hapticsSeconds), many(totals.hapticsEvents, "event", "events")));
+    tiles.push(tile("Haptics", duration(totals.hapticsSeconds), `${many(totals.hapticsEvents, "event", "events")}${totals.hapticsEvents ? ", taken as seconds" : ""}`));
     if (totals.messages > 0) tiles.push(tile("Messages", count(totals.messages), `${percent(totals.redundantMessages / totals.messages)} said nothing new${data.filter?.since === undefined && data.filter?.until === undefined ? "" : "; of whole sessions"}`));
     return el("ul", { class: "numbers" }, ...tiles);
   }
@@ -877,7 +877,7 @@
     const haptics = rowsOf(data.haptics);
     const formats = rowsOf(data.playing.formats);
     const wrap = (title, about, made) => el("figure", {}, el("figcaption", {}, el("h3", {}, title), about ? el("p", {}, about) : null), made);
-    parts.push(wrap("Haptics by application", "For how long the haptics engine was on.", haptics.length
+    parts.push(wrap("Haptics by application", "For how long the haptics engine was on. Applications report it without a unit; the page takes it for seconds.", haptics.length
       ? table([["Application", (row) => named(row.application)], ["Events", (row) => count(row.count), true], ["Together", (row) => duration(row.seconds), true]], haptics)
       : empty("The haptics engine was not used in this time.")));
     parts.push(wrap("Formats", `How long was played in each format${formats.length === MOST_FORMATS ? `; the ${MOST_FORMATS} that played longest` : ""}.`, formats.length
