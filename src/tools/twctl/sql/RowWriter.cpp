@@ -96,7 +96,9 @@ class CsvRows final : public RowWriter {
       if (at > 0) out_ << ',';
       const std::string text = textOfValue(row[at]);
       const bool isText = std::holds_alternative<std::string>(row[at]);
-      write(text, isText && (text.empty() || text.find_first_of(",\"\r\n") != std::string::npos));
+      // Many readers skip an empty line.
+      const bool isWholeLine = row.size() == 1 && text.empty();
+      write(text, isWholeLine || (isText && (text.empty() || text.find_first_of(",\"\r\n") != std::string::npos)));
     }
     out_ << "\r\n";
   }

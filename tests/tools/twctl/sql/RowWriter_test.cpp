@@ -68,6 +68,12 @@ TEST_F(RowWriterTest, WritesCsvAsRfc4180) {
             "\"x,y\",z\r\n\"say \"\"a\"\"\",\"two\r\nlines\"\r\n\"\",\r\n");
 }
 
+// Many readers skip an empty line, so that there were fewer rows.
+TEST_F(RowWriterTest, CsvHasNoEmptyLineForNullInTheOnlyColumn) {
+  EXPECT_EQ(written(csv, {"a"}, {{SqlValue()}, {"b"}}), "a\r\n\"\"\r\nb\r\n");
+  EXPECT_EQ(written(csv, {"a", "b"}, {{SqlValue(), SqlValue()}}), "a,b\r\n,\r\n");
+}
+
 TEST_F(RowWriterTest, WritesTheHeaderOfACsvWithoutRows) {
   EXPECT_EQ(written(csv, {"a", "b"}, {}), "a,b\r\n");
 }
