@@ -1,38 +1,16 @@
 # SPDX-License-Identifier: Apache-2.0
 """Makes a store for the queries of the pages: tables with the names and columns of the store's views, and a few rows in each."""
 
-import re
 import sqlite3
+import sys
 import time
 
 from programs import SOURCE
 
-COLUMNS = {
-    "session": "id INTEGER, reporter_id INTEGER, service TEXT, application TEXT, process TEXT, user_id INTEGER, started_at REAL,"
-    " ended_at REAL, ending TEXT, messages INTEGER, unique_messages INTEGER, redundant_messages INTEGER, active_seconds REAL,"
-    " overloads INTEGER",
-    "event": "id INTEGER, at REAL, session INTEGER, category TEXT, type TEXT, source TEXT, payload TEXT",
-    "volume_stretch": "id INTEGER, session INTEGER, service TEXT, application TEXT, started_at REAL, ended_at REAL, seconds REAL,"
-    " device TEXT, volume REAL, volume_bucket REAL, sample_rate INTEGER, channels INTEGER, format TEXT, ringer INTEGER,"
-    " spatial INTEGER",
-    "input_stretch": "id INTEGER, session INTEGER, service TEXT, application TEXT, started_at REAL, ended_at REAL, seconds REAL,"
-    " device TEXT, mode TEXT, input_port TEXT, vocoders TEXT",
-    "gather_stretch": "id INTEGER, session INTEGER, service TEXT, application TEXT, started_at REAL, ended_at REAL, seconds REAL,"
-    " device TEXT, sample_rate INTEGER, channels INTEGER, format TEXT",
-    "issue": "id INTEGER, at REAL, session INTEGER, service TEXT, application TEXT, kind TEXT, node TEXT, duration_seconds REAL,"
-    " buffer_frames INTEGER, io_cycle INTEGER",
-    "haptics": "id INTEGER, at REAL, application TEXT, name TEXT, seconds REAL, status INTEGER",
-    "channel_value": "session INTEGER, at REAL, driver TEXT, group_name TEXT, subgroup TEXT, name TEXT, unit TEXT, value INTEGER",
-    "channel_bucket": "session INTEGER, at REAL, driver TEXT, group_name TEXT, subgroup TEXT, name TEXT, unit TEXT, lower INTEGER,"
-    " upper INTEGER, hits INTEGER",
-    "channel_state": "session INTEGER, at REAL, driver TEXT, group_name TEXT, subgroup TEXT, name TEXT, state TEXT,"
-    " transitions INTEGER, residency INTEGER, duty_cycle REAL",
-}
+sys.path.insert(0, str(SOURCE / "tests/support/reports"))
+from store_views import columns, schema_version  # pylint: disable=wrong-import-position
 
-
-def schema_version():
-    text = (SOURCE / "src/platform/linux/store/StoreSchema.h").read_text()
-    return int(re.search(r"kStoreSchemaVersion = (\d+)", text).group(1))
+COLUMNS = columns()
 
 
 def rows(hour):
@@ -96,8 +74,8 @@ def begin_of_last_hour():
 def make_store(path, hour):
     with sqlite3.connect(path) as store:
         store.execute(f"PRAGMA user_version = {schema_version()}")
-        for table, columns in COLUMNS.items():
-            store.execute(f"CREATE TABLE {table} ({columns})")
+        for table, named in COLUMNS.items():
+            store.execute(f"CREATE TABLE {table} ({named})")
             for row in rows(hour)[table]:
                 store.execute(f"INSERT INTO {table} VALUES ({', '.join('?' * len(row))})", row)
     store.close()

@@ -7,6 +7,7 @@
 
 #include "platform/linux/store/SqliteDatabase.h"
 #include "platform/linux/store/StoreSchema.h"
+#include "platform/linux/store/StoreViews.h"
 
 namespace tonewerk {
 
@@ -15,40 +16,16 @@ class ReportViews {
  public:
   explicit ReportViews(const std::string& path) {
     EXPECT_TRUE(database_.open(path, SqliteDatabase::Mode::kReadWrite, std::chrono::seconds(5)));
-    run("PRAGMA journal_mode = OFF; PRAGMA synchronous = OFF;"
-        "CREATE TABLE session (id INTEGER, reporter_id INTEGER, service TEXT, application TEXT, process "
-        "TEXT, "
-        "user_id INTEGER, started_at REAL, ended_at REAL, ending TEXT, messages INTEGER, unique_messages "
-        "INTEGER, "
-        "redundant_messages INTEGER, active_seconds REAL, overloads INTEGER);"
-        "CREATE TABLE event (id INTEGER, at REAL, session INTEGER, category TEXT, type TEXT, source TEXT, "
-        "payload TEXT);"
-        "CREATE TABLE volume_stretch (id INTEGER, session INTEGER, service TEXT, application TEXT, "
-        "started_at "
-        "REAL, ended_at REAL, seconds REAL, device TEXT, volume REAL, volume_bucket REAL, sample_rate "
-        "INTEGER, "
-        "channels INTEGER, format TEXT, ringer INTEGER);"
-        "CREATE TABLE input_stretch (id INTEGER, session INTEGER, service TEXT, application TEXT, started_at "
-        "REAL, ended_at REAL, seconds REAL, device TEXT, mode TEXT, input_port TEXT, vocoders TEXT);"
-        "CREATE TABLE gather_stretch (id INTEGER, session INTEGER, service TEXT, application TEXT, "
-        "started_at "
-        "REAL, ended_at REAL, seconds REAL, device TEXT, sample_rate INTEGER, channels INTEGER, format TEXT);"
-        "CREATE TABLE issue (id INTEGER, at REAL, session INTEGER, service TEXT, application TEXT, kind "
-        "TEXT, "
-        "node TEXT, duration_seconds REAL, buffer_frames INTEGER, io_cycle INTEGER);"
-        "CREATE TABLE haptics (id INTEGER, at REAL, application TEXT, name TEXT, seconds REAL, status "
-        "INTEGER);"
-        "CREATE TABLE channel_value (session INTEGER, at REAL, driver TEXT, group_name TEXT, subgroup TEXT, "
-        "name "
-        "TEXT, unit TEXT, value INTEGER);"
-        "CREATE TABLE channel_bucket (session INTEGER, at REAL, driver TEXT, group_name TEXT, subgroup TEXT, "
-        "name "
-        "TEXT, unit TEXT, lower INTEGER, upper INTEGER, hits INTEGER);"
-        "CREATE TABLE channel_state (session INTEGER, at REAL, driver TEXT, group_name TEXT, subgroup TEXT, "
-        "name "
-        "TEXT, state TEXT, transitions INTEGER, residency INTEGER, duty_cycle REAL);"
-        "PRAGMA user_version = " +
-        std::to_string(kStoreSchemaVersion));
+    std::string tables;
+    for (const StoreView& view : storeViews()) {
+      std::string columns;
+      for (const StoreViewColumn& column : view.columns) {
+        columns.append(columns.empty() ? "" : ", ").append(column.name).append(" ").append(column.type);
+      }
+      tables.append("CREATE TABLE ").append(view.name).append(" (").append(columns).append(");");
+    }
+    run("PRAGMA journal_mode = OFF; PRAGMA synchronous = OFF;" + tables +
+        "PRAGMA user_version = " + std::to_string(kStoreSchemaVersion));
   }
 
   void run(const std::string& sql) { EXPECT_TRUE(database_.run(sql)) << database_.problem(); }
@@ -63,7 +40,7 @@ class ReportViews {
         "', 'player', 1000, " + from + ", " + until + ", 'stopped', 10, 8, 2, " + std::to_string(seconds) +
         ", 0); INSERT INTO volume_stretch VALUES (" + id + ", " + id + ", 'longformaudio', '" + application +
         "', " + from + ", " + until + ", " + std::to_string(seconds) + ", '" + device + "', " +
-        std::to_string(volume) + ", " + std::to_string(volume) + ", 48000, 2, 'S32LE', 0)");
+        std::to_string(volume) + ", " + std::to_string(volume) + ", 48000, 2, 'S32LE', 0, 0)");
   }
 
   void overloaded(int session, double at, int frames) {

@@ -12,27 +12,8 @@ import random
 import re
 import sqlite3
 
-SOURCE = pathlib.Path(__file__).resolve().parents[3]
-SCHEMA = re.search(r"kStoreSchemaVersion = (\d+)", (SOURCE / "src/platform/linux/store/StoreSchema.h").read_text()).group(1)
-TABLES = """
-CREATE TABLE session (id INTEGER, reporter_id INTEGER, service TEXT, application TEXT, process TEXT, user_id INTEGER, started_at REAL,
-  ended_at REAL, ending TEXT, messages INTEGER, unique_messages INTEGER, redundant_messages INTEGER, active_seconds REAL, overloads INTEGER);
-CREATE TABLE event (id INTEGER, at REAL, session INTEGER, category TEXT, type TEXT, source TEXT, payload TEXT);
-CREATE TABLE volume_stretch (id INTEGER, session INTEGER, service TEXT, application TEXT, started_at REAL, ended_at REAL, seconds REAL,
-  device TEXT, volume REAL, volume_bucket REAL, sample_rate INTEGER, channels INTEGER, format TEXT, ringer INTEGER);
-CREATE TABLE input_stretch (id INTEGER, session INTEGER, service TEXT, application TEXT, started_at REAL, ended_at REAL, seconds REAL,
-  device TEXT, mode TEXT, input_port TEXT, vocoders TEXT);
-CREATE TABLE gather_stretch (id INTEGER, session INTEGER, service TEXT, application TEXT, started_at REAL, ended_at REAL, seconds REAL,
-  device TEXT, sample_rate INTEGER, channels INTEGER, format TEXT);
-CREATE TABLE issue (id INTEGER, at REAL, session INTEGER, service TEXT, application TEXT, kind TEXT, node TEXT, duration_seconds REAL,
-  buffer_frames INTEGER, io_cycle INTEGER);
-CREATE TABLE haptics (id INTEGER, at REAL, application TEXT, name TEXT, seconds REAL, status INTEGER);
-CREATE TABLE channel_value (session INTEGER, at REAL, driver TEXT, group_name TEXT, subgroup TEXT, name TEXT, unit TEXT, value INTEGER);
-CREATE TABLE channel_bucket (session INTEGER, at REAL, driver TEXT, group_name TEXT, subgroup TEXT, name TEXT, unit TEXT, lower INTEGER,
-  upper INTEGER, hits INTEGER);
-CREATE TABLE channel_state (session INTEGER, at REAL, driver TEXT, group_name TEXT, subgroup TEXT, name TEXT, state TEXT,
-  transitions INTEGER, residency INTEGER, duty_cycle REAL);
-"""
+from store_views import schema, schema_version
+
 DAY = 86400
 END = 1795176000  # 2026-11-20 12:00 UTC
 DRIVER = "SpeakerAmp"
@@ -44,7 +25,7 @@ class Device:
     def __init__(self, path, seed):
         path.unlink(missing_ok=True)
         self.database = sqlite3.connect(path)
-        self.database.executescript("PRAGMA journal_mode = OFF; PRAGMA synchronous = OFF;" + TABLES + f"PRAGMA user_version = {SCHEMA};")
+        self.database.executescript("PRAGMA journal_mode = OFF; PRAGMA synchronous = OFF;" + schema() + f"PRAGMA user_version = {schema_version()};")
         self.random = random.Random(seed)
         self.sessions = 0
         self.rows = {}
@@ -78,7 +59,7 @@ class Device:
         for seconds, device, volume, ringer in stretches:
             if device:
                 self.add("volume_stretch", session * 100 + overloads, session, service, application, now, now + seconds, seconds, device,
-                         volume, max(1, round(volume * 16)) / 16, 48000, 2, "S32LE", ringer)
+                         volume, max(1, round(volume * 16)) / 16, 48000, 2, "S32LE", ringer, 0)
                 self.message(now, session, "Volume", "Generic", QMSessionVolume=volume)
                 active += seconds
                 count = int(self.random.expovariate(1) * overload_rate * seconds / 600)

@@ -270,7 +270,7 @@ TEST_F(ReportDataTest, KeepsTheLongestStretchesOfEverySession) {
                                 std::to_string(ReportData::kMostStretches + 100) +
                                 ") INSERT INTO volume_stretch SELECT i, 1, 's', 'Melody', 1795132800 + i, "
                                 "1795132800.5 + i, 0.5, 'Speaker', "
-                                "0.5, 0.5, 48000, 2, 'f', 0 FROM n";
+                                "0.5, 0.5, 48000, 2, 'f', 0, 0 FROM n";
   views_.played(1, "Melody", kDay, 3600.0, "Speaker", 0.5);
   views_.played(2, "Phone", kDay, 0.1, "Earpiece", 0.75);
   views_.run(stretches);
