@@ -1,16 +1,14 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <CLI/CLI.hpp>
-#include <filesystem>
 #include <memory>
 #include <optional>
 #include <ostream>
 #include <string>
-#include <sys/stat.h>
 #include <system_error>
 #include <utility>
 
-#include "platform/linux/files/LinuxFileSystem.h"
 #include "tools/twctl/commands/Commands.h"
+#include "tools/twctl/commands/OutputFile.h"
 #include "tools/twctl/commands/ReportReading.h"
 #include "tools/twctl/input/TimeRangeOptions.h"
 #include "tools/twctl/report/ReportPage.h"
@@ -25,29 +23,12 @@ struct ReportOptions {
   ReportScopeOptions scope;
 };
 
-// Makes files that only their owner may read: a page says what people at this device listened to, and when.
-class OwnerOnly {
- public:
-  OwnerOnly() : before_(umask(S_IRWXG | S_IRWXO)) {}
-  OwnerOnly(const OwnerOnly&) = delete;
-  OwnerOnly& operator=(const OwnerOnly&) = delete;
-  ~OwnerOnly() { umask(before_); }
-
- private:
-  const mode_t before_;
-};
-
 // The file appears when it is complete. Fails when there is such a file already.
-std::error_code writeFile(const std::string& file, const std::string& text) {
-  std::error_code error;
-  const std::filesystem::path path = std::filesystem::absolute(file, error);
-  if (error) return error;
-  LinuxFileSystem files;
-  const OwnerOnly scope;
-  const std::unique_ptr<NewFile> made = files.createFile(path.parent_path(), path.filename(), error);
-  if (!error) error = made->write(text);
-  if (!error) error = made->place(path.filename());
-  return error;
+std::error_code writeFile(const std::string& name, const std::string& text) {
+  OutputFile file;
+  if (const std::error_code error = file.begin(name)) return error;
+  file.stream() << text;
+  return file.end();
 }
 
 int report(Tool& tool, const ReportOptions& options) {
