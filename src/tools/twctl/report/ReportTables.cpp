@@ -202,7 +202,7 @@ std::string ReportTables::misplacedBefore(double now) {
 bool ReportTables::hasViews() {
   const auto views = database_.number(
       "SELECT count(*) FROM sqlite_master WHERE name IN ('session', 'event', 'volume_stretch', "
-      "'input_stretch', 'gather_stretch', 'issue', 'haptics', 'channel_value', 'channel_bucket')");
+      "'input_stretch', 'issue', 'haptics', 'channel_value', 'channel_bucket', 'channel_state')");
   if (!views) return fail(database_.problem());
   if (*views == kViews) return true;
   return fail(

@@ -413,6 +413,8 @@ TEST_F(ReportDataTest, ValuesThatAreNotKnownAreNull) {
 }
 
 TEST_F(ReportDataTest, NamesTheFileAndWhatItLacks) {
+  views_.run("DROP TABLE channel_state");
+  EXPECT_THAT(problem(), testing::AllOf(HasSubstr("reports.db: "), HasSubstr("it has no views for reports")));
   views_.run("DROP TABLE volume_stretch");
   EXPECT_THAT(problem(), testing::AllOf(HasSubstr("reports.db: "), HasSubstr("it has no views for reports")));
   const TemporaryDirectory empty;
