@@ -282,8 +282,8 @@ struct ChannelQuery {
   const char* group;  // the columns' places: five for the channel, then the keys
   const char* sums;
   const char* weight;
-  const char* order;   // of a channel's rows, whose numbers `place` count from 0 to `places`
-  std::string part;    // an expression
+  const char* order;    // of a channel's rows, whose numbers `place` count from 0 to `places`
+  std::string part;     // an expression
   std::string columns;  // of the rows of a part
 };
 
@@ -314,13 +314,14 @@ ValueMap ofChannels(ReportTables& tables, const char* columns, const ChannelQuer
 ValueMap drivers(ReportTables& tables) {
   ValueMap drivers;
   const std::string most = std::to_string(ReportData::kMostParts);
-  drivers.set("buckets",
-              ofChannels(tables, "driver:t group:t subgroup:t name:t unit:t lower:i upper:i hits:i",
-                         {"channel_bucket", "coalesce(unit, '')", "lower, upper", "1, 2, 3, 4, 5, 6, 7",
-                          "sum(hits) AS hits", "hits", "lower, upper",
-                          "place * min(places, " + most + ") / places", "min(lower), max(upper), sum(hits)"}));
-  const std::string state = "CASE WHEN places <= " + most + " OR place < " + most +
-                            " - 1 THEN state ELSE 'all other states' END";
+  drivers.set(
+      "buckets",
+      ofChannels(tables, "driver:t group:t subgroup:t name:t unit:t lower:i upper:i hits:i",
+                 {"channel_bucket", "coalesce(unit, '')", "lower, upper", "1, 2, 3, 4, 5, 6, 7",
+                  "sum(hits) AS hits", "hits", "lower, upper", "place * min(places, " + most + ") / places",
+                  "min(lower), max(upper), sum(hits)"}));
+  const std::string state =
+      "CASE WHEN places <= " + most + " OR place < " + most + " - 1 THEN state ELSE 'all other states' END";
   drivers.set(
       "states",
       ofChannels(tables, "driver:t group:t subgroup:t name:t unit:t state:t transitions:i residency:i",

@@ -179,7 +179,7 @@ bool ReportTables::openFile(const std::string& directory) {
 std::string ReportTables::misplacedBefore(double now) {
   constexpr double kDay = 86'400.0;
   constexpr std::int64_t kDecimals = 3;
-  // The daemon dates sessions and events. Events are in the order of their identifiers, so few of them are read.
+  // The daemon dates sessions and events. Events are in the order of their identifiers, so few are read.
   const ValueMap times = first(
       "oldest:d newest:d",
       "SELECT min(t), max(t) FROM (SELECT min(started_at) AS t FROM main.session UNION ALL SELECT "
@@ -195,8 +195,8 @@ std::string ReportTables::misplacedBefore(double now) {
   };
   const std::string least = text(oldest > 0.0 ? oldest - kDay : 0.0);
   const std::string most = text((newest > now ? newest : now) + kDay);
-  return "coalesce(started_at NOT BETWEEN " + least + " AND " + most + ", 0) OR coalesce(ended_at NOT BETWEEN " +
-         least + " AND " + most + ", 0)";
+  return "coalesce(started_at NOT BETWEEN " + least + " AND " + most +
+         ", 0) OR coalesce(ended_at NOT BETWEEN " + least + " AND " + most + ", 0)";
 }
 
 bool ReportTables::hasViews() {

@@ -98,7 +98,8 @@ class CsvRows final : public RowWriter {
       const bool isText = std::holds_alternative<std::string>(row[at]);
       // Many readers skip an empty line.
       const bool isWholeLine = row.size() == 1 && text.empty();
-      write(text, isWholeLine || (isText && (text.empty() || text.find_first_of(",\"\r\n") != std::string::npos)));
+      write(text,
+            isWholeLine || (isText && (text.empty() || text.find_first_of(",\"\r\n") != std::string::npos)));
     }
     out_ << "\r\n";
   }

@@ -111,8 +111,9 @@ TEST_F(ReportCommandTest, SaysWhatTheDaemonDroppedAndRefused) {
   EXPECT_EQ(run({"report", "--json"}), kDone);
   EXPECT_THAT(
       output(),
-      HasSubstr(R"("daemon":{"answers":true,"tellsSinks":true,"refused":[{"user":1000,"resource":"keptBytes",)"
-                R"("times":3}],"linesHeldBack":4,"sinks":[{"sink":"store","waiting":17,"dropped":5,"hangs":2.5}]})"));
+      HasSubstr(
+          R"("daemon":{"answers":true,"tellsSinks":true,"refused":[{"user":1000,"resource":"keptBytes",)"
+          R"("times":3}],"linesHeldBack":4,"sinks":[{"sink":"store","waiting":17,"dropped":5,"hangs":2.5}]})"));
 }
 
 TEST_F(ReportCommandTest, SaysThatAUserWhoIsNotTrustedIsToldOfNoSink) {

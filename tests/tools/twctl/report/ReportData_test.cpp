@@ -114,14 +114,15 @@ TEST_F(ReportDataTest, AStretchWithoutTimesCountsWhereItWasRecorded) {
   EXPECT_EQ(at(read({.until = kDay}), {"totals", "playSeconds"}), "100000");
 }
 
-// A program says when its stretches began. One wrong time made the picture of everything else too narrow to see.
+// A program says when its stretches began. One wrong time made everything else too narrow to see.
 TEST_F(ReportDataTest, AStretchWhoseTimeCannotBeCountsButIsInNoPicture) {
   views_.played(1, "Melody", kDay, 600.0, "Speaker", 0.5);
   views_.run(
       "INSERT INTO volume_stretch (id, session, application, started_at, ended_at, seconds, volume) VALUES "
       "(11, 1, 'Melody', 1e14, 1e14 + 1, 1, 1), (12, 1, 'Melody', 1.79e12, 1.79e12 + 2, 2, 1), (13, 1, "
       "'Melody', 5, 9, 4, 1), (14, 1, 'Melody', -1e14, 1795132900, 8, 1), (15, 1, 'Melody', 1795132700, "
-      "1795132790, 16, 1); INSERT INTO input_stretch (id, session, started_at, ended_at, seconds) VALUES (16, "
+      "1795132790, 16, 1); INSERT INTO input_stretch (id, session, started_at, ended_at, seconds) VALUES "
+      "(16, "
       "1, 1e14, 1e14 + 1, 1)");
   const ValueMap data = read();
   EXPECT_EQ(at(data, {"totals", "playSeconds"}), "631");
@@ -258,10 +259,11 @@ TEST_F(ReportDataTest, KeepsTheMostOverloadedOfTheSessionsThatAreNotAmongTheLong
 
 TEST_F(ReportDataTest, CountsTheInputsThatItLeavesOut) {
   views_.played(1, "Melody", kDay, 3600.0, "Speaker", 0.5);
-  views_.run("WITH RECURSIVE n(i) AS (SELECT 1 UNION ALL SELECT i + 1 FROM n WHERE i < " +
-             std::to_string(ReportData::kMostMarks + 7) +
-             ") INSERT INTO input_stretch (id, session, started_at, ended_at, seconds) SELECT i, 1, 1795132800 "
-             "+ i, 1795132800.5 + i, 0.5 FROM n");
+  views_.run(
+      "WITH RECURSIVE n(i) AS (SELECT 1 UNION ALL SELECT i + 1 FROM n WHERE i < " +
+      std::to_string(ReportData::kMostMarks + 7) +
+      ") INSERT INTO input_stretch (id, session, started_at, ended_at, seconds) SELECT i, 1, 1795132800 "
+      "+ i, 1795132800.5 + i, 0.5 FROM n");
   EXPECT_EQ(at(read(), {"timeline", "leftOut", "inputs"}), "7");
 }
 
@@ -312,7 +314,8 @@ TEST_F(ReportDataTest, AddsUpNeighboursOfManyBucketsAndTheShortestOfManyStates) 
   views_.played(1, "Melody", kDay, 100.0, "Speaker", 0.5);
   views_.run(
       "WITH RECURSIVE n(i) AS (SELECT 0 UNION ALL SELECT i + 1 FROM n WHERE i < 999) INSERT INTO "
-      "channel_bucket SELECT 1, 1795132900, 'amp', 'g', '', 'wake', 'ms', i * 10, i * 10 + 10, 3 FROM n; WITH "
+      "channel_bucket SELECT 1, 1795132900, 'amp', 'g', '', 'wake', 'ms', i * 10, i * 10 + 10, 3 FROM n; "
+      "WITH "
       "RECURSIVE n(i) AS (SELECT 0 UNION ALL SELECT i + 1 FROM n WHERE i < 999) INSERT INTO channel_state "
       "SELECT 1, 1795132900, 'amp', 'g', '', 'power', 's' || i, 1, 1000 - i, 0 FROM n");
   const ValueMap data = read();
@@ -325,7 +328,8 @@ TEST_F(ReportDataTest, AddsUpNeighboursOfManyBucketsAndTheShortestOfManyStates) 
   };
   EXPECT_EQ(sum("buckets", 7), 3000);
   EXPECT_EQ(sum("states", 7), 500'500);
-  EXPECT_THAT(rows(data, "drivers", "buckets"), testing::StartsWith(R"([["amp","g","","wake","ms",0,160,48],)"));
+  EXPECT_THAT(rows(data, "drivers", "buckets"),
+              testing::StartsWith(R"([["amp","g","","wake","ms",0,160,48],)"));
   EXPECT_THAT(rows(data, "drivers", "states"), HasSubstr(R"("all other states",937,)"));
 }
 
@@ -380,7 +384,8 @@ TEST_F(ReportDataTest, SaysWhyASessionOfTheStoreIsNotInTheScope) {
               testing::EndsWith(": session 7 was not open in the time of --since and --until"));
   EXPECT_THAT(problem({.application = "Ph*", .session = 7}),
               testing::EndsWith(": session 7 is not of an application that Ph* fits"));
-  EXPECT_FALSE(ReportData::read(directory_.path(), {.since = kDay + 200.0, .session = 7}, kNow).isUnknownSession);
+  EXPECT_FALSE(
+      ReportData::read(directory_.path(), {.since = kDay + 200.0, .session = 7}, kNow).isUnknownSession);
 }
 
 TEST_F(ReportDataTest, ARunningSessionHasNoEndAndLastsUntilNowOrTheNewestReportOfADaemonThatHasGone) {
