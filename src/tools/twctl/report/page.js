@@ -804,9 +804,10 @@
     });
   }
 
+  const MOST_BUFFERS = 40;
   function overloadsByBuffer() {
     return columnFigure({
-      id: "buffers", title: "Overloads by buffer size", about: "Smaller buffers give shorter delays and less time to fill them.", rows: overloaded, value: (row) => row.count, colour: "var(--bad)", counts: true,
+      id: "buffers", title: "Overloads by buffer size", about: `Smaller buffers give shorter delays and less time to fill them.${overloaded.length === MOST_BUFFERS ? ` These are the ${MOST_BUFFERS} smallest.` : ""}`, rows: overloaded, value: (row) => row.count, colour: "var(--bad)", counts: true,
       ordinal: (row) => (row.frames === null ? UNKNOWN : count(row.frames)), x: () => ({ type: "band", domain: overloaded.map((row) => (row.frames === null ? UNKNOWN : count(row.frames))), padding: 0.3 }), label: "frames in the buffer", yLabel: "overloads",
       columns: [["Frames", (row) => (row.frames === null ? UNKNOWN : count(row.frames)), true], ["Overloads", (row) => count(row.count), true], ["Together", (row) => duration(row.seconds), true]],
       emptyText: "No overload was recorded in this time.",
