@@ -1065,7 +1065,9 @@
     if (!timelineFigure.update()) {
       const next = timeline();
       timelineFigure.replaceWith(next);
-      parts.find(({ nodes }) => nodes[0] === timelineFigure).nodes = [next];
+      const part = parts.find(({ nodes }) => nodes[0] === timelineFigure);
+      part.nodes = [next];
+      part.text = textOf([next]);
       timelineFigure = next;
       pictures = pictures.filter(({ box }) => box.isConnected);
       pictures.filter(({ box }) => next.contains(box)).forEach((picture) => draw(picture));

@@ -139,7 +139,8 @@ void LiveSessions::remember(const ValueMap& rows, double watchedSince) {
       PlayChange change = storedChange(*cells);
       if (change.time < watchedSince && said.size() < kMostChanges) said.push_front(std::move(change));
     }
-    if (said.empty()) continue;
+    // Changes beyond kMostChanges are merged into the base, which may be newer than all that is stored.
+    if (said.empty() || session.base.time >= watchedSince) continue;
     std::deque<PlayChange> all = std::exchange(session.changes, {});
     std::erase_if(all, [&](const PlayChange& change) { return change.time < watchedSince; });
     session.base = {};

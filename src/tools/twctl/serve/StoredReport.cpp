@@ -59,7 +59,8 @@ void StoredReport::run() {
 
 void StoredReport::readIfChanged() {
   std::string stamp = source_.stamp();
-  if (stamp == stamp_) return;
+  // After a problem the files may be back as they were.
+  if (stamp == stamp_ && newest()->problem.empty()) return;
   auto next = std::make_shared<Reading>(source_.read());
   // What failed is tried again.
   if (next->problem.empty()) stamp_ = std::move(stamp);

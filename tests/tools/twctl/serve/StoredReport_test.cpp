@@ -61,6 +61,18 @@ TEST_F(StoredReportTest, KeepsWhatItHasWhenAReadingFailsAndTriesAgain) {
   EXPECT_EQ(report_.newest()->problem, "");
 }
 
+TEST_F(StoredReportTest, ForgetsAProblemWhenTheFilesAreBackAsTheyWere) {
+  EXPECT_EQ(report_.readFirst(), "");
+  report_.start();
+  isBroken_ = true;
+  content_ = 2;
+  waitUntil([](const StoredReport::Reading& newest) { return !newest.problem.empty(); });
+  content_ = 1;
+  isBroken_ = false;
+  waitUntil([](const StoredReport::Reading& newest) { return newest.problem.empty(); });
+  EXPECT_EQ(report_.newest()->data.integer("content"), 1);
+}
+
 TEST_F(StoredReportTest, SaysWhyItCannotBeReadAtFirst) {
   isBroken_ = true;
   EXPECT_EQ(report_.readFirst(), "broken");
