@@ -227,7 +227,8 @@ class Daemon {
   }
 
   // Ends the daemon in order. Every client is treated as lost, so that its started sessions stop and report.
-  void endInOrder() {
+  // False when some reports could not be written.
+  [[nodiscard]] bool endInOrder() {
     manager_.tellStopping("Finishing sessions and reports");
     runtimeWatcher_ = nullptr;
     listener_.shutDown();
@@ -239,9 +240,10 @@ class Daemon {
       TWReportingSystemMonitor::reset();  // while the queue of its handlers exists
     });
     queue.drain();
-    if (!flushSinks()) return;
+    if (!flushSinks()) return false;
     queue.async([this] { upkeep_->dropNow(); });
     queue.drain();
+    return true;
   }
 
   // Whether the destructor would wait for a disk that does not answer.
@@ -448,12 +450,12 @@ int run() {
   const ServiceManager manager{};
   Daemon daemon(directories, std::move(socket), linux, manager, log);
   serveUntilEndSignal(daemon);
-  daemon.endInOrder();
+  const bool areReportsWritten = daemon.endInOrder();
   if (daemon.hangs()) {
     (void)linux.flushLog(kLogTimeout);
     ::_exit(kFailure);
   }
-  return kSuccess;
+  return areReportsWritten ? kSuccess : kFailure;
 }
 
 }  // namespace
