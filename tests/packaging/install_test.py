@@ -46,7 +46,8 @@ class InstallTest(unittest.TestCase):
         for name in ["bin/twreportingd", "lib/systemd/user/twreportingd.socket", "etc/tonewerk/device-facts.toml",
                      "etc/tonewerk/preferences/com.orvane.tonewerk.store.toml", "etc/apparmor.d/usr.bin.twreportingd",
                      "lib/sysusers.d/tonewerk.conf", "lib/tmpfiles.d/tonewerk.conf",
-                     "share/bash-completion/completions/twctl"]:
+                     "share/bash-completion/completions/twctl", "share/zsh/vendor-completions/_twctl",
+                     "share/fish/vendor_completions.d/twctl.fish"]:
             self.assertIn(f"somewhere/of/mine/{name}", installed)
 
     def test_names_the_programs_of_the_prefix(self):

@@ -4,6 +4,7 @@
 #include <CLI/CLI.hpp>
 #include <exception>
 
+#include "tools/twctl/commands/CompletionCommand.h"
 #include "tools/twctl/input/UsageProblem.h"
 
 namespace tonewerk {
@@ -54,7 +55,12 @@ int runCommandLine(int argc, const char* const* argv, Tool& tool) {
   addPathsCommand(app, tool);
   addKillCommand(app, tool);
   addSandboxCommand(app, tool);
+  addCompletionCommand(app, tool);
   try {
+    if (const auto question = CompletionQuestion::read(argc, argv)) {
+      answerCompletion(app, tool, *question);
+      return tool.status;
+    }
     app.parse(argc, argv);
   } catch (const CLI::ParseError& error) {
     // The parser reports --help and --version in this way, too.

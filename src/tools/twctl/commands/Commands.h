@@ -43,6 +43,7 @@ void addChannelsCommand(CLI::App& app, Tool& tool);
 void addPathsCommand(CLI::App& app, Tool& tool);
 void addKillCommand(CLI::App& app, Tool& tool);
 void addSandboxCommand(CLI::App& app, Tool& tool);
+void addCompletionCommand(CLI::App& app, Tool& tool);
 
 // Adds a command with the common options.
 CLI::App& addCommand(CLI::App& app, Tool& tool, const std::string& name, const std::string& description);

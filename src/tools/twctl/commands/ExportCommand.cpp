@@ -117,9 +117,9 @@ void addExportCommand(CLI::App& app, Tool& tool) {
                  "\nThe store is read whether a daemon runs or not.");
   const auto options = std::make_shared<ExportOptions>();
   command.add_option("VIEW", options->view, "The view or table")->required();
-  command.add_option("--format", options->format, "csv or jsonl")
+  command.add_option("--format", options->format, "How each row is written")
       ->required()
-      ->type_name("FORMAT")
+      ->type_name("csv|jsonl")
       ->check(problemWithFormat);
   command.add_option("-o,--output", options->file, "The file to make; else standard output")
       ->type_name("FILE");

@@ -53,7 +53,8 @@ void addPathsCommand(CLI::App& app, Tool& tool) {
       "Only one, by itself, for other programs:\n"
       "  sqlite3 -readonly \"$(twctl paths store)\" .tables");
   const auto name = std::make_shared<std::string>();
-  command.add_option("NAME", *name, "store, runtime, state, logs, configuration or socket");
+  command.add_option("NAME", *name, "Only this path")
+      ->type_name("store|runtime|state|logs|configuration|socket");
   command.callback([&tool, name] { showPaths(tool, *name); });
 }
 

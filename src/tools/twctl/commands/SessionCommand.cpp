@@ -212,8 +212,8 @@ void addSessionCommands(CLI::App& app, Tool& tool) {
   why.add_option("--message", options->message, "The number of a message, which `twctl session` shows")
       ->type_name("N")
       ->check(problemWithCount);
-  why.add_option("--missing", options->missing, "volume, input or gather: why there is no such summary")
-      ->type_name("KIND")
+  why.add_option("--missing", options->missing, "Why there is no such summary")
+      ->type_name("volume|input|gather")
       ->check(problemWithMissing);
   why.callback([&tool, options] { tool.status = explain(tool, *options); });
 }

@@ -125,16 +125,24 @@ std::optional<AudioEventType> typeOfArgument(std::string_view text) {
   return numberNamed(types(), text);
 }
 
-std::string unknownCategory(std::string_view text) {
-  std::vector<std::string> names = namesOf(baseCategories());
-  const std::string listed = thereAre(names);  // too many of them have a domain to list them all
+std::vector<std::string> baseCategoryNames() { return namesOf(baseCategories()); }
+
+std::vector<std::string> categoryNames() {
+  std::vector<std::string> names = baseCategoryNames();
   for (std::string& name : namesOf(categoriesOfDomains())) names.push_back(std::move(name));
-  const std::optional<std::string> meant = closestTo(text, names);
+  return names;
+}
+
+std::vector<std::string> typeNames() { return namesOf(types()); }
+
+std::string unknownCategory(std::string_view text) {
+  const std::string listed = thereAre(baseCategoryNames());  // too many have a domain to list them all
+  const std::optional<std::string> meant = closestTo(text, categoryNames());
   return "there is no category '" + std::string(text) + "'; " + (meant ? didYouMean(*meant) : listed);
 }
 
 std::string unknownType(std::string_view text) {
-  return "there is no type '" + std::string(text) + "'; " + hintFor(text, namesOf(types()));
+  return "there is no type '" + std::string(text) + "'; " + hintFor(text, typeNames());
 }
 
 std::string problemWithReporterID(const std::string& text) {

@@ -4,6 +4,7 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <vector>
 
 #include "protocol/AudioEvent.h"
 #include "values/Value.h"
@@ -23,6 +24,11 @@ Value valueOfArgument(std::string_view text);
 
 // Reads "Start", "Unknown" or a number; none for any other text.
 [[nodiscard]] std::optional<AudioEventType> typeOfArgument(std::string_view text);
+
+// All names that the functions above read, without Unknown; of categories also only those without a domain.
+std::vector<std::string> baseCategoryNames();
+std::vector<std::string> categoryNames();
+std::vector<std::string> typeNames();
 
 // Say that there is no such category or type, and which ones there are.
 std::string unknownCategory(std::string_view text);
