@@ -14,6 +14,7 @@ inline const SharedString kWatchKeyServiceName("serviceName");
 inline const SharedString kWatchKeyCategory("category");
 inline const SharedString kWatchKeyType("type");
 inline const SharedString kWatchKeyRedundant("redundant");
+inline const SharedString kWatchKeyOverloads("overloads");
 inline const SharedString kWatchKeyTime("time");
 inline const SharedString kWatchKeyApplication("application");
 inline const SharedString kWatchKeyPayload("payload");

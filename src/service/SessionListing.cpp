@@ -61,7 +61,8 @@ void Portion::add(const TWReportingSession& session, const std::optional<std::st
                  {kWatchKeySingleMessageSession, session.isSingleMessageSession()},
                  {kWatchKeyApplication, shownApplication(session.configuration())},
                  {kWatchKeyMessages, session.totalMessageCount()},
-                 {kWatchKeyRedundant, session.redundantMessageCount()}};
+                 {kWatchKeyRedundant, session.redundantMessageCount()},
+                 {kWatchKeyOverloads, session.overloadCount()}};
   if (!session.processIdentifiers().empty()) {
     shown.set(kWatchKeyProcessIdentifier, session.processIdentifiers().front());
   }

@@ -393,6 +393,7 @@ void TWReportingSession::stop(SessionEnding ending) {
   forgetMessages();
   totalMessageCount_ = 0;
   redundantMessageCount_ = 0;
+  overloads_ = 0;
   started_ = false;
   startedAt_.reset();
 }

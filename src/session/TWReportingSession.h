@@ -155,6 +155,8 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   // How many messages were received since the session was made or last stopped, and how many were redundant.
   std::uint64_t totalMessageCount() const { return totalMessageCount_; }
   std::uint64_t redundantMessageCount() const { return redundantMessageCount_; }
+  // How many overloads were counted since then.
+  std::uint64_t overloadCount() const { return overloads_; }
   // The monotonic time of the start; none while the session is not started.
   std::optional<std::chrono::nanoseconds> startedAt() const { return startedAt_; }
   bool started() const { return started_; }

@@ -9,6 +9,7 @@
 #include "service/MessageFilter.h"
 #include "service/SessionListing.h"
 #include "support/ServiceTest.h"
+#include "workers/TWReportingWorkerClasses.h"
 
 namespace tonewerk {
 namespace {
@@ -118,8 +119,30 @@ TEST_F(WatchRequestsTest, DescribesEachSession) {
             R"({"total":1,"sessions":[{"reporterID":77,"serviceType":7,"serviceName":")" +
                 sessionOf(0, 77)->serviceName() +
                 R"(","started":true,"singleMessageSession":false,"application":"com.example.player",)"
-                R"("messages":3,"redundant":1,"processIdentifier":11,"processName":"player",)"
+                R"("messages":3,"redundant":1,"overloads":0,"processIdentifier":11,"processName":"player",)"
                 R"("seconds":12.5}]})");
+}
+
+// Overloads are counted by a worker.
+class WatchedOverloadsTest : public ServiceTest {
+ protected:
+  WatchedOverloadsTest() : ServiceTest(allWorkerClasses()) {}
+};
+
+TEST_F(WatchedOverloadsTest, ASessionHasThoseSinceItsStart) {
+  const auto client = connect(11);
+  start(*client, 77);
+  const auto overloads = [&] {
+    const Value answer = askOnce(*client, "watch.sessions", {0});
+    return answer.asMap()->find("sessions")->asArray()->begin()->asMap()->integer("overloads");
+  };
+  for (int count = 0; count < 2; ++count) {
+    ask(*client, "sendMessage",
+        {ValueMap{{"issue_type", "overload"}}, 7, static_cast<int>(kTypeError), Value(ValueArray{77})});
+  }
+  EXPECT_EQ(overloads(), 2);
+  ask(*client, "stopReportingSessionForID", {77});
+  EXPECT_EQ(overloads(), 0);
 }
 
 TEST_F(WatchRequestsTest, ASessionThatIsNotStartedHasNoRunningTime) {
