@@ -5,6 +5,7 @@
 #include <cstdio>
 #include <fcntl.h>
 #include <filesystem>
+#include <fstream>
 #include <map>
 #include <nlohmann/json.hpp>
 #include <sstream>
@@ -18,6 +19,7 @@
 #include "support/TemporaryDirectory.h"
 #include "system/support/DaemonTest.h"
 #include "system/support/PseudoTerminal.h"
+#include "system/support/Vt52Screen.h"
 
 namespace tonewerk {
 namespace {
@@ -197,7 +199,8 @@ TEST_F(WatchingTest, TopPrintsOneFrameIntoAFile) {
   send(client, 1);
   const auto text = outputOf(twctl({"top", "--interval", "0.1"}));
   ASSERT_TRUE(text);
-  EXPECT_THAT(*text, HasSubstr("1 session, 0.0 messages a second\nsession  service    application "));
+  EXPECT_THAT(*text,
+              HasSubstr("1 session, 0.0 messages a second, 0 overloads\nsession  service    application "));
   EXPECT_THAT(*text, HasSubstr("77       telephony  com.example.phone  "));
   EXPECT_THAT(*text, HasSubstr("50.0 %"));
   EXPECT_EQ(text->find('\x1b'), std::string::npos);
@@ -220,36 +223,113 @@ class TopOnATerminalTest : public WatchingTest {
     before = terminal.modes();
   }
 
-  void startTop() {
-    ChildCommand command = twctl({"top", "--interval", "0.1"});
+  // A terminal of the type xterm is switched to another screen and back; that of a vt52 has simple controls.
+  void startTop(const std::string& type = "xterm", const std::string& interval = "0.1") {
+    ChildCommand command = twctl({"top", "--interval", interval});
+    command.environment["TERM"] = type;
+    command.environment["RUNTIME_DIRECTORY"] = directory.path("runtime");
     command.input = terminal.path();
     ASSERT_TRUE(tool.start(command, terminal.path(), directory.path("errors")));
-    ASSERT_TRUE(terminal.waitFor("\x1b[?1049h")) << errors();
+    if (type == "xterm") {
+      ASSERT_TRUE(terminal.waitFor("\x1b[?1049h")) << errors();
+      ASSERT_TRUE(terminal.waitFor("0 sessions")) << errors();
+    }
   }
   void expectRestored() {
     ASSERT_TRUE(terminal.waitFor("\x1b[?1049l"));
     const termios after = terminal.modes();
     EXPECT_EQ(after.c_lflag, before.c_lflag);
+    EXPECT_EQ(after.c_iflag, before.c_iflag);
+    EXPECT_EQ(after.c_oflag, before.c_oflag);
     EXPECT_EQ(after.c_cc[VMIN], before.c_cc[VMIN]);
-    EXPECT_THAT(terminal.written(), HasSubstr("\x1b[?25h"));
+    // The cursor is visible again, after it was hidden for the last time.
+    const std::string& written = terminal.written();
+    const std::size_t shown = written.rfind("?25h");
+    ASSERT_NE(shown, std::string::npos);
+    EXPECT_TRUE(written.rfind("\x1b[?25l") == std::string::npos || written.rfind("\x1b[?25l") < shown);
+  }
+  // What the vt52 shows now.
+  Vt52Screen screen() {
+    Vt52Screen screen(columns, rows);
+    screen.write(terminal.written());
+    return screen;
+  }
+  bool waitForOnScreen(const std::string& text) {
+    return waitUntil([&] { return screen().text().find(text) != std::string::npos; });
+  }
+  bool waitForGoneFromScreen(const std::string& text) {
+    return waitUntil([&] { return screen().text().find(text) == std::string::npos; });
+  }
+  void resize(unsigned short newColumns, unsigned short newRows) {
+    columns = newColumns;
+    rows = newRows;
+    terminal.resize(newColumns, newRows);
   }
 
   PseudoTerminal terminal;
   termios before{};
+  unsigned short columns = 80;
+  unsigned short rows = 24;
 };
 
 TEST_F(TopOnATerminalTest, RefreshesUntilQIsPressed) {
   DaemonClient client = player();
-  startTop();
-  ASSERT_TRUE(terminal.waitFor("com.example.phone"));
+  resize(140, 24);  // so that nothing is cut
+  startTop("vt52");
+  ASSERT_TRUE(waitForOnScreen("com.example.phone")) << errors();
   EXPECT_EQ(terminal.modes().c_lflag & ICANON, 0U);
   client.setConfiguration(kSession, {{"HostApplicationDisplayID", "com.example.\x1b[31mred"}});
-  ASSERT_TRUE(terminal.waitFor("com.example.\\u001b[31mred"));
+  ASSERT_TRUE(waitForOnScreen("com.example.\\u001b[31mred")) << screen().text();
+  EXPECT_EQ(screen().unknown(), "");
   EXPECT_TRUE(tool.isRunning());
   terminal.press("xq");
   EXPECT_EQ(tool.wait(), 0);
-  expectRestored();
+  EXPECT_EQ(terminal.modes().c_lflag, before.c_lflag);
   EXPECT_EQ(errors(), "");
+}
+
+TEST_F(TopOnATerminalTest, KeysChangeWhatIsShown) {
+  DaemonClient client = player();
+  DaemonClient other = connect();
+  other.create(78);
+  other.setConfiguration(78, {{"HostApplicationDisplayID", "org.example.other"}});
+  startTop("vt52");
+  ASSERT_TRUE(waitForOnScreen("com.example.phone")) << errors();
+  ASSERT_TRUE(waitForOnScreen("org.example.other"));
+  terminal.press("?");
+  ASSERT_TRUE(waitForOnScreen("sort by the column")) << screen().text();
+  terminal.press("x");
+  ASSERT_TRUE(waitForOnScreen("com.example.phone"));
+  terminal.press("/ORG");
+  ASSERT_TRUE(waitForOnScreen("only rows with: ORG_"));
+  terminal.press("\r");
+  ASSERT_TRUE(waitForOnScreen("sessions with \"ORG\""));
+  EXPECT_THAT(screen().text(), testing::Not(HasSubstr("com.example.phone")));
+  terminal.press("\x1b");
+  ASSERT_TRUE(waitForOnScreen("com.example.phone")) << screen().text();
+  terminal.press("1");
+  ASSERT_TRUE(waitForGoneFromScreen("session  service"));
+  terminal.press("n");
+  ASSERT_TRUE(waitForOnScreen("no bridge tells"));
+  terminal.press("q");
+  EXPECT_EQ(tool.wait(), 0);
+}
+
+TEST_F(TopOnATerminalTest, ShowsHowTheAudioDoes) {
+  DaemonClient client = player();
+  client.send({{"issue_type", "overload"}}, 7, kTypeError, {kSession});
+  const std::string channels = directory.path("runtime/channels");
+  std::filesystem::create_directories(channels);
+  std::ofstream(channels + "/bridge.json") << R"({"driver": "PipeWire1", "channels": [
+        {"group": "Tx", "subgroup": "speaker", "name": "Xruns", "unit": "xruns", "format": "simple", "value": 2},
+        {"group": "Nodes", "subgroup": "mixer", "name": "Busy", "unit": "permille", "format": "simple", "value": 340}]})";
+  startTop("vt52");
+  ASSERT_TRUE(waitForOnScreen("1 overload\n")) << screen().text() << errors();
+  EXPECT_THAT(screen().text(), HasSubstr("speaker: idle, 2 xruns\n"));
+  terminal.press("n");
+  ASSERT_TRUE(waitForOnScreen("mixer  34 %")) << screen().text();
+  terminal.press("q");
+  EXPECT_EQ(tool.wait(), 0);
 }
 
 TEST_F(TopOnATerminalTest, EndsWithControlCAndWithSignals) {
@@ -257,7 +337,7 @@ TEST_F(TopOnATerminalTest, EndsWithControlCAndWithSignals) {
   terminal.press("\x03");
   EXPECT_EQ(tool.wait(), 0);
   expectRestored();
-  for (const int signal : {SIGINT, SIGTERM, SIGHUP}) {
+  for (const int signal : {SIGINT, SIGTERM, SIGHUP, SIGQUIT}) {
     startTop();
     tool.signal(signal);
     EXPECT_EQ(tool.wait(), 0);
@@ -268,12 +348,14 @@ TEST_F(TopOnATerminalTest, EndsWithControlCAndWithSignals) {
 TEST_F(TopOnATerminalTest, FitsTheWindow) {
   DaemonClient client = connect();
   for (ReporterID reporterID = 1; reporterID <= 5; ++reporterID) client.create(reporterID);
-  terminal.resize(80, 5);
-  startTop();
-  ASSERT_TRUE(terminal.waitFor("... and 3 more"));
-  terminal.resize(80, 6);
+  resize(60, 7);
+  startTop("vt52");
+  ASSERT_TRUE(waitForOnScreen("... and 3 more")) << screen().text();
+  EXPECT_THAT(screen().text(), HasSubstr("overloads"));
+  EXPECT_THAT(screen().text(), testing::Not(HasSubstr("redundant")));
+  resize(80, 8);
   tool.signal(SIGWINCH);  // the system sends it to a terminal's own processes
-  EXPECT_TRUE(terminal.waitFor("... and 2 more"));
+  EXPECT_TRUE(waitForOnScreen("... and 2 more")) << screen().text();
   terminal.press("q");
   EXPECT_EQ(tool.wait(), 0);
 }
@@ -284,6 +366,18 @@ TEST_F(TopOnATerminalTest, RestoresTheTerminalBeforeItSaysThatTheDaemonHasGone) 
   EXPECT_EQ(tool.wait(), 3);
   expectRestored();
   EXPECT_THAT(errors(), HasSubstr("twctl: the daemon has gone"));
+}
+
+TEST_F(TopOnATerminalTest, PrintsOneFrameOnATerminalThatCannotShowPages) {
+  DaemonClient client = player();
+  for (const char* type : {"dumb", "", "no-such-terminal"}) {
+    startTop(type);
+    EXPECT_EQ(tool.wait(), 0) << type;
+    ASSERT_TRUE(terminal.waitFor("1 session, ")) << type << errors();
+    ASSERT_TRUE(terminal.waitFor("com.example.phone")) << type;
+    EXPECT_EQ(terminal.written().find('\x1b'), std::string::npos) << type;
+    EXPECT_EQ(terminal.modes().c_lflag, before.c_lflag);
+  }
 }
 
 // Tests of twctl tail.

@@ -9,6 +9,7 @@
 #include <csignal>
 #include <fcntl.h>
 #include <poll.h>
+#include <sys/ioctl.h>
 #include <unistd.h>
 
 namespace tonewerk {
@@ -39,7 +40,7 @@ int millisecondsUntil(const std::optional<LiveEvents::Time>& until) {
 
 }  // namespace
 
-LiveEvents::LiveEvents(int in, int out) : in_(in), out_(out) {
+LiveEvents::LiveEvents(int in, int out, Keys keys) : in_(in), out_(out), keys_(keys) {
   assert(handlersPipe == -1);
   std::array<int, 2> ends{-1, -1};
   if (::pipe2(ends.data(), O_CLOEXEC | O_NONBLOCK) != 0)
@@ -90,6 +91,12 @@ std::optional<LiveEvents::Event> LiveEvents::takeSignal() {
 }
 
 bool LiveEvents::takeKey() {
+  if (keys_ == Keys::kLeft) {
+    int bytes = 0;
+    if (::ioctl(in_, FIONREAD, &bytes) == 0 && bytes > 0) return true;
+    in_ = -1;  // the end of the input
+    return false;
+  }
   const ssize_t count = ::read(in_, &key_, 1);
   if (count == 0) in_ = -1;  // the end of the input, which would always be readable
   if (count < 0 && errno != EINTR && errno != EAGAIN) in_ = -1;

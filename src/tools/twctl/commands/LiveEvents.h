@@ -19,13 +19,16 @@ class LiveEvents {
   enum class Event {
     kTime,      // the time has come
     kReadable,  // the descriptor is readable
-    kKey,       // a key was pressed; key() returns it
+    kKey,       // a key was pressed; key() returns it, unless the caller reads keys
     kResized,   // the terminal has another size
     kStopped,   // by a signal, or because the reader of the output has closed it
   };
 
+  // Who reads the keys. With kLeft, kKey means that there is something to read.
+  enum class Keys { kRead, kLeft };
+
   // Reads keys from `in`, and watches `out` for the end of its reader. -1 for none.
-  LiveEvents(int in, int out);
+  LiveEvents(int in, int out, Keys keys = Keys::kRead);
   LiveEvents(const LiveEvents&) = delete;
   LiveEvents& operator=(const LiveEvents&) = delete;
   // Restores the previous signal handlers.
@@ -44,6 +47,7 @@ class LiveEvents {
 
   int in_;
   const int out_;
+  const Keys keys_;
   FileDescriptor signals_;  // receives a byte for each signal
   bool isStopped_ = false;
   char key_ = 0;

@@ -2,12 +2,15 @@
 #include <CLI/CLI.hpp>
 #include <algorithm>
 #include <chrono>
+#include <deque>
 #include <memory>
 #include <optional>
 #include <ostream>
 #include <thread>
 #include <utility>
 
+#include "platform/Log.h"
+#include "platform/linux/channels/LinuxChanmeter.h"
 #include "protocol/Requests.h"
 #include "protocol/WatchKeys.h"
 #include "tools/twctl/DaemonCalls.h"
@@ -15,61 +18,97 @@
 #include "tools/twctl/commands/LiveEvents.h"
 #include "tools/twctl/commands/TopLoop.h"
 #include "tools/twctl/input/ValueArguments.h"
+#include "tools/twctl/show/AudioHealth.h"
 #include "tools/twctl/show/SessionRates.h"
 #include "tools/twctl/show/TopFrame.h"
+#include "tools/twctl/terminal/CursesScreen.h"
 #include "values/PrintableText.h"
 
 namespace tonewerk {
 namespace {
 
-constexpr char kControlC = 3;
-
 double steadyNow() {
   return std::chrono::duration<double>(std::chrono::steady_clock::now().time_since_epoch()).count();
 }
 
-// Shows pages on the tool's terminal.
+// Shows pages on the tool's terminal. Keys that are pressed while the daemon is asked wait for waitUntil().
 class TerminalScreen final : public LiveScreen {
  public:
+  // isOpen() says whether pages can be shown.
   explicit TerminalScreen(const Tool& tool)
-      : out_(tool.out),
-        events_(tool.inDescriptor, tool.outDescriptor),
-        terminal_(tool.out, tool.inDescriptor, tool.outDescriptor) {}
+      : events_(tool.inDescriptor, tool.outDescriptor, LiveEvents::Keys::kLeft),
+        screen_(CursesScreen::open(tool.inDescriptor, tool.outDescriptor)) {}
 
-  TerminalSize size() const override { return terminal_.size(); }
-  void show(const std::vector<std::string>& lines) override { terminal_.show(lines); }
+  bool isOpen() const { return screen_ != nullptr; }
+
+  TerminalSize size() const override { return screen_->size(); }
+  void show(const std::vector<TopLine>& lines) override { screen_->show(lines); }
   double now() const override { return steadyNow(); }
+  char32_t key() const override { return key_; }
 
   [[nodiscard]] Event waitUntil(double time) override {
     const auto until = LiveEvents::Time(
         std::chrono::duration_cast<LiveEvents::Time::duration>(std::chrono::duration<double>(time)));
     for (;;) {
-      const LiveEvents::Event event = events_.wait(-1, until);
-      if (event == LiveEvents::Event::kTime) return Event::kTime;
-      if (event == LiveEvents::Event::kResized) return Event::kResized;
-      if (isEnd(event)) return Event::kQuit;
+      if (!pressed_.empty()) {
+        key_ = pressed_.front();
+        pressed_.pop_front();
+        return Event::kKey;
+      }
+      switch (events_.wait(-1, until)) {
+        case LiveEvents::Event::kTime:
+          return Event::kTime;
+        case LiveEvents::Event::kStopped:
+          return Event::kQuit;
+        case LiveEvents::Event::kResized:
+          screen_->resize();
+          return Event::kResized;
+        case LiveEvents::Event::kKey:
+          takeKeys();
+          break;
+        case LiveEvents::Event::kReadable:
+          break;
+      }
     }
   }
 
   // False when the user quits before the descriptor is readable.
   bool waitReadable(int descriptor) {
     for (;;) {
-      const LiveEvents::Event event = events_.wait(descriptor, std::nullopt);
-      if (event == LiveEvents::Event::kReadable) return true;
-      if (isEnd(event)) return false;
+      switch (events_.wait(descriptor, std::nullopt)) {
+        case LiveEvents::Event::kReadable:
+          return true;
+        case LiveEvents::Event::kStopped:
+          return false;
+        case LiveEvents::Event::kResized:
+          screen_->resize();
+          break;
+        case LiveEvents::Event::kKey:
+          takeKeys();
+          if (std::any_of(pressed_.begin(), pressed_.end(), endsAtOnce)) return false;
+          break;
+        case LiveEvents::Event::kTime:
+          break;
+      }
     }
   }
 
  private:
-  bool isEnd(LiveEvents::Event event) const {
-    if (event == LiveEvents::Event::kStopped || !out_) return true;
-    if (event != LiveEvents::Event::kKey) return false;
-    return events_.key() == 'q' || events_.key() == 'Q' || events_.key() == kControlC;
+  static constexpr std::size_t kMostKeys = 1000;
+
+  // While the daemon does not answer, nothing else can be done.
+  static bool endsAtOnce(char32_t key) { return key == U'q' || key == U'Q' || key == kKeyControlC; }
+
+  void takeKeys() {
+    while (const auto key = screen_->takeKey()) {
+      if (pressed_.size() < kMostKeys) pressed_.push_back(*key);
+    }
   }
 
-  std::ostream& out_;
   LiveEvents events_;
-  Terminal terminal_;  // destroyed, and so restored, before the signal handlers are
+  std::unique_ptr<CursesScreen> screen_;  // destroyed, and so restored, before the signal handlers are
+  std::deque<char32_t> pressed_;
+  char32_t key_ = 0;
 };
 
 // Reads all sessions in portions. None when `ask` returned none.
@@ -90,11 +129,34 @@ std::optional<std::vector<ValueMap>> listSessions(Ask ask) {
   return sessions;
 }
 
-void printFrame(const Tool& tool, const std::vector<SessionRow>& rows) {
+// Reads the driver channels of the chosen directories.
+class Channels {
+ public:
+  explicit Channels(const Tool& tool)
+      : category_(log_, "com.orvane.tonewerk", "twctl"),
+        chanmeter_(tool.directories().runtime + "/channels", category_) {}
+
+  AudioHealth health() { return reader_.read(); }
+
+ private:
+  // Whoever asks about sessions is not told of a driver's wrong file; `twctl channels` does that.
+  class NoLog final : public Log {
+    bool isEnabled(std::string_view /*category*/, LogLevel /*level*/) const override { return false; }
+    void write(std::string_view /*subsystem*/, std::string_view /*category*/, LogLevel /*level*/,
+               std::string_view /*message*/) override {}
+  };
+
+  NoLog log_;
+  LogCategory category_;
+  LinuxChanmeter chanmeter_;
+  AudioHealthReader reader_{chanmeter_};
+};
+
+void printFrame(const Tool& tool, const std::vector<SessionRow>& rows, const AudioHealth& health) {
   if (tool.asJson) {
     for (const SessionRow& row : rows) tool.out << printable(topObject(row).text()) << '\n';
   } else {
-    for (const std::string& line : topFrame(rows, std::nullopt)) tool.out << line << '\n';
+    for (const std::string& line : topFrame(rows, health)) tool.out << line << '\n';
   }
   tool.out.flush();
 }
@@ -106,46 +168,50 @@ void printOneFrame(const Tool& tool, DaemonCalls& daemon, double interval) {
     return daemon.call(requests::kWatchSessions.name, arguments, result) ? result : std::nullopt;
   };
   SessionRates rates;
+  Channels channels(tool);
   const auto first = listSessions(ask);
   if (!first) return;
   rates.rowsOf(*first, steadyNow());  // only to have counts to compare with
+  channels.health();
   std::this_thread::sleep_for(std::chrono::duration<double>(interval));
   const auto second = listSessions(ask);
-  if (second) printFrame(tool, rates.rowsOf(*second, steadyNow()));
+  if (second) printFrame(tool, rates.rowsOf(*second, steadyNow()), channels.health());
 }
 
-void showOnTerminal(Tool& tool, DaemonCalls& daemon, double interval) {
+// False when the terminal cannot show pages; nothing is then done.
+bool showOnTerminal(Tool& tool, DaemonCalls& daemon, double interval) {
   std::optional<DaemonFailure> failure;
   {
     TerminalScreen screen(tool);
+    if (!screen.isOpen()) return false;
     const auto ask = [&](const Arguments& arguments) {
       return daemon.await(
           requests::kWatchSessions.name, arguments,
           [&screen](int descriptor) { return screen.waitReadable(descriptor); }, failure);
     };
-    runTop([&ask] { return listSessions(ask); }, screen, interval);
+    Channels channels(tool);
+    runTop([&ask] { return listSessions(ask); }, [&channels] { return channels.health(); }, screen, interval);
   }
   if (failure) tool.status = tool.fail(failure->status, failure->problem);
+  return true;
 }
 
 void top(Tool& tool, double interval) {
   DaemonCalls daemon(tool);
   if (!daemon.connect(DaemonCalls::Role::kOnlooker)) return;
-  if (tool.outIsTerminal && !tool.asJson) {
-    showOnTerminal(tool, daemon, interval);
-  } else {
-    printOneFrame(tool, daemon, interval);
-  }
+  const bool wantsPages = tool.outIsTerminal && !tool.asJson;
+  if (!wantsPages || !showOnTerminal(tool, daemon, interval)) printOneFrame(tool, daemon, interval);
 }
 
 }  // namespace
 
 void addTopCommand(CLI::App& app, Tool& tool) {
-  CLI::App& command = addCommand(app, tool, "top", "What sessions receive, as it happens, the busiest first");
+  CLI::App& command =
+      addCommand(app, tool, "top", "What sessions receive, and how the audio does, as it happens");
   command.footer(
-      "On a terminal until q or Ctrl-C; elsewhere, and with --json, once, after one interval. Only for "
-      "trusted\n"
-      "users.");
+      "On a terminal until q or Ctrl-C; h shows the keys: sorting, filter, columns, the graph's nodes, "
+      "pause.\n"
+      "Elsewhere, and with --json, once, after one interval. Only for trusted users.");
   const auto interval = std::make_shared<double>(1.0);
   command.add_option("--interval", *interval, "Over so many seconds messages are counted (1)")
       ->check(problemWithSeconds)

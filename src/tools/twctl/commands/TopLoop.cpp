@@ -2,22 +2,25 @@
 #include "tools/twctl/commands/TopLoop.h"
 
 #include "tools/twctl/show/SessionRates.h"
-#include "tools/twctl/show/TopFrame.h"
 
 namespace tonewerk {
 
-void runTop(const SessionSource& source, LiveScreen& screen, double interval) {
+void runTop(const SessionSource& sessions, const HealthSource& health, LiveScreen& screen, double interval) {
   SessionRates rates;
+  TopView view;
   for (;;) {
-    const auto listing = source();
-    if (!listing) return;
     const double now = screen.now();
-    const std::vector<SessionRow> rows = rates.rowsOf(*listing, now);
+    if (!view.isPaused()) {
+      const auto listing = sessions();
+      if (!listing) return;
+      view.update(rates.rowsOf(*listing, screen.now()), health());
+    }
     LiveScreen::Event event{};
     do {
-      screen.show(topFrame(rows, screen.size()));
+      screen.show(view.page(screen.size()));
       event = screen.waitUntil(now + interval);
-    } while (event == LiveScreen::Event::kResized);
+      if (event == LiveScreen::Event::kKey && !view.press(screen.key())) return;
+    } while (event == LiveScreen::Event::kResized || event == LiveScreen::Event::kKey);
     if (event == LiveScreen::Event::kQuit) return;
   }
 }

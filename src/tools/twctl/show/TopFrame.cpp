@@ -2,70 +2,44 @@
 #include "tools/twctl/show/TopFrame.h"
 
 #include <algorithm>
-#include <array>
-#include <cstdio>
 #include <sstream>
 #include <utility>
 
-#include "protocol/WatchKeys.h"
 #include "tools/twctl/show/Table.h"
-#include "values/Utf8.h"
+#include "tools/twctl/show/TopCells.h"
 
 namespace tonewerk {
 namespace {
 
-constexpr std::size_t kHeadLines = 2;  // the sums and the columns
-
-std::string withDecimal(double number) {
-  std::array<char, 64> text{};
-  std::snprintf(text.data(), text.size(), "%.1f", number);
-  return text.data();
-}
-
-std::string clientOf(const ValueMap& session) {
-  std::string text = session.text(kWatchKeyProcessName);
-  if (text.empty()) text = session.boolean(kWatchKeySingleMessageSession) ? "(the daemon)" : "?";
-  return text + " " + session.text(kWatchKeyProcessIdentifier);
-}
-
-std::string shareOf(const SessionRow& row) {
-  return row.redundantShare ? withDecimal(*row.redundantShare * 100) + " %" : "-";
-}
-
-std::string runningTimeOf(const ValueMap& session) {
-  const Value* seconds = session.find(kWatchKeySeconds);
-  return seconds == nullptr ? "-" : runningTime(seconds->number());
-}
-
-std::string summaryOf(const std::vector<SessionRow>& rows) {
-  double sum = 0;
-  bool isKnown = false;
-  for (const SessionRow& row : rows) {
-    sum += row.messagesPerSecond.value_or(0);
-    isKnown = isKnown || row.messagesPerSecond;
+void appendTable(std::vector<std::string>& lines, const TopCells& cells) {
+  std::ostringstream text;
+  {
+    std::vector<std::string> titles;
+    for (const TopColumn& column : cells.columns) titles.emplace_back(column.title);
+    Table table(text, false, std::move(titles));
+    for (const std::vector<TopCell>& row : cells.rows) {
+      std::vector<Table::Cell> shown;
+      shown.reserve(row.size());
+      for (const TopCell& cell : row) shown.emplace_back(Value(cell.text));
+      table.add(std::move(shown));
+    }
   }
-  std::string text = std::to_string(rows.size()) + (rows.size() == 1 ? " session" : " sessions");
-  return isKnown ? text + ", " + withDecimal(sum) + " messages a second" : text;
-}
-
-std::vector<std::string> linesOf(const std::string& text) {
-  std::vector<std::string> lines;
-  std::istringstream stream(text);
+  std::istringstream stream(text.str());
   for (std::string line; std::getline(stream, line);) lines.push_back(std::move(line));
-  return lines;
-}
-
-// The first `columns` characters, as utf8Characters() counts them.
-std::string cutTo(std::size_t columns, const std::string& line) {
-  std::size_t characters = 0;
-  for (std::size_t at = 0; at < line.size(); ++at) {
-    if (isUtf8Continuation(line[at])) continue;
-    if (characters++ == columns) return line.substr(0, at);
-  }
-  return line;
 }
 
 }  // namespace
+
+std::vector<std::string> topFrame(const std::vector<SessionRow>& rows, const AudioHealth& health) {
+  std::vector<std::string> lines{topSummary(rows)};
+  for (const DeviceHealth& device : health.devices) lines.push_back(deviceLine(device));
+  appendTable(lines, sessionCells(rows));
+  if (!health.nodes.empty()) {
+    lines.emplace_back();
+    appendTable(lines, nodeCells(health.nodes));
+  }
+  return lines;
+}
 
 std::string runningTime(double seconds) {
   constexpr std::int64_t kMinute = 60;
@@ -81,34 +55,6 @@ std::string runningTime(double seconds) {
   const std::string clock =
       std::to_string(whole % kDay / kHour) + ":" + twoDigits(whole % kHour / kMinute) + ":" + tail;
   return whole < kDay ? clock : std::to_string(whole / kDay) + " d " + clock;
-}
-
-std::vector<std::string> topFrame(const std::vector<SessionRow>& rows,
-                                  const std::optional<TerminalSize>& size) {
-  std::size_t shown = rows.size();
-  if (size && kHeadLines + rows.size() > size->rows) {
-    shown = size->rows > kHeadLines ? size->rows - kHeadLines - 1 : 0;
-  }
-  std::ostringstream text;
-  {
-    Table table(text, false,
-                {"session", "service", "application", "client", "msg/s", "redundant", "running"});
-    for (std::size_t at = 0; at < shown; ++at) {
-      const ValueMap& session = rows[at].session;
-      const auto& rate = rows[at].messagesPerSecond;
-      table.add({Value(session.integer(kWatchKeyReporterID)), Value(session.text(kWatchKeyServiceName)),
-                 Value(session.text(kWatchKeyApplication)), Value(clientOf(session)),
-                 Value(rate ? withDecimal(*rate) : "-"), Value(shareOf(rows[at])),
-                 Value(runningTimeOf(session))});
-    }
-  }
-  std::vector<std::string> lines = linesOf(text.str());
-  lines.insert(lines.begin(), summaryOf(rows));
-  if (shown < rows.size()) lines.push_back("... and " + std::to_string(rows.size() - shown) + " more");
-  if (!size) return lines;
-  if (lines.size() > size->rows) lines.resize(size->rows);
-  for (std::string& line : lines) line = cutTo(size->columns, line);
-  return lines;
 }
 
 ValueMap topObject(const SessionRow& row) {

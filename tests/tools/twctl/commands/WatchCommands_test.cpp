@@ -75,8 +75,8 @@ TEST_F(WatchCommandsTest, TopPrintsOneFrameWhereThereIsNoTerminal) {
   EXPECT_EQ(run({"top", "--interval", "0.05"}), kDone);
   EXPECT_EQ(out.str(),
             "1 session, 0.0 messages a second\n"
-            "session  service    application  client  msg/s  redundant  running\n"
-            "77       telephony               ? 11    0.0    -          -\n");
+            "session  service    application  client  msg/s  redundant  overloads  running\n"
+            "77       telephony               ? 11    0.0    -          -          -\n");
   EXPECT_THAT(daemon.requestsFor("watch.sessions"), SizeIs(2));
 }
 

@@ -20,86 +20,67 @@ SessionRow row(std::int64_t reporterID) {
            {"processName", "phone"},
            {"messages", 8},
            {"redundant", 2},
+           {"overloads", 1},
            {"seconds", 187.9}},
           12.34,
           0.25};
 }
 
-std::vector<SessionRow> rows(std::size_t count) {
-  std::vector<SessionRow> all;
-  for (std::size_t at = 1; at <= count; ++at) all.push_back(row(static_cast<std::int64_t>(at)));
-  return all;
-}
-
 TEST(TopFrameTest, ShowsWhatASessionIsAndDoes) {
-  EXPECT_THAT(topFrame({row(77)}, std::nullopt),
-              ElementsAre("1 session, 12.3 messages a second",
-                          "session  service    application        client    msg/s  redundant  running",
-                          "77       telephony  com.example.phone  phone 11  12.3   25.0 %     3:07"));
+  EXPECT_THAT(
+      topFrame({row(77)}, {}),
+      ElementsAre("1 session, 12.3 messages a second, 1 overload",
+                  "session  service    application        client    msg/s  redundant  overloads  running",
+                  "77       telephony  com.example.phone  phone 11  12.3   25.0 %     1          3:07"));
 }
 
 TEST(TopFrameTest, PutsADashWhereNothingIsKnown) {
   SessionRow unknown = row(77);
   unknown.session.erase("seconds");
   unknown.session.erase("processName");
+  unknown.session.erase("overloads");
   unknown.messagesPerSecond.reset();
   unknown.redundantShare.reset();
-  const auto lines = topFrame({unknown}, std::nullopt);
+  const auto lines = topFrame({unknown}, {});
   EXPECT_EQ(lines.at(0), "1 session");
-  EXPECT_EQ(lines.at(2), "77       telephony  com.example.phone  ? 11    -      -          -");
+  EXPECT_EQ(lines.at(2), "77       telephony  com.example.phone  ? 11    -      -          -          -");
 }
 
 TEST(TopFrameTest, SaysWhoseTheSingleMessageSessionIs) {
   SessionRow single = row(1);
   single.session.erase("processName");
   single.session.set("singleMessageSession", true);
-  EXPECT_THAT(topFrame({single}, std::nullopt).at(2), HasSubstr("  (the daemon) 11  "));
+  EXPECT_THAT(topFrame({single}, {}).at(2), HasSubstr("  (the daemon) 11  "));
 }
 
-TEST(TopFrameTest, SaysThatThereIsNothing) {
-  EXPECT_THAT(topFrame({}, std::nullopt), ElementsAre("0 sessions"));
-}
-
-TEST(TopFrameTest, WhatFitsTheHeightIsShownWhole) {
-  EXPECT_THAT(topFrame(rows(4), TerminalSize{80, 6}), SizeIs(6));
-  EXPECT_THAT(topFrame(rows(4), TerminalSize{80, 6}).back(), HasSubstr("telephony"));
-}
-
-TEST(TopFrameTest, SaysHowManyMoreThereAre) {
-  const auto lines = topFrame(rows(5), TerminalSize{80, 6});
-  ASSERT_THAT(lines, SizeIs(6));
-  EXPECT_THAT(lines[4], HasSubstr("telephony"));
-  EXPECT_EQ(lines[5], "... and 2 more");
-}
-
-TEST(TopFrameTest, FitsIntoTheSmallestWindow) {
-  for (const std::size_t height : {1U, 2U, 3U}) {
-    const auto lines = topFrame(rows(5), TerminalSize{10, height});
-    EXPECT_LE(lines.size(), height);
-    EXPECT_EQ(lines.front(), "5 sessions");
-  }
-}
-
-TEST(TopFrameTest, CutsLinesToTheWidthBetweenCharacters) {
-  SessionRow wide = row(77);
-  wide.session.set("serviceName", "\xC3\xBC\xC3\xBC\xC3\xBC\xC3\xBC");
-  EXPECT_EQ(topFrame({wide}, TerminalSize{11, 24}).at(2), "77       \xC3\xBC\xC3\xBC");
-}
+TEST(TopFrameTest, SaysThatThereIsNothing) { EXPECT_THAT(topFrame({}, {}), ElementsAre("0 sessions")); }
 
 TEST(TopFrameTest, MakesControlCharactersHarmless) {
   SessionRow evil = row(77);
   evil.session.set("application", "a\x1b[2Jb\nc");
   evil.session.set("processName", "p\x1b");
-  const auto lines = topFrame({evil}, std::nullopt);
+  const auto lines = topFrame({evil}, {});
   ASSERT_THAT(lines, SizeIs(3));
   EXPECT_THAT(lines[2], HasSubstr("  a\\u001b[2Jb\\nc  p\\u001b 11  "));
 }
 
+TEST(TopFrameTest, SaysHowDevicesAndNodesDo) {
+  AudioHealth health;
+  health.devices = {{"spea\x1bker", false, 0.34, 0.5, 2}, {"mic", true, std::nullopt, std::nullopt, 1}};
+  health.nodes = {{"player", 0.125, 0.9, 3, 4711}};
+  EXPECT_THAT(
+      topFrame({}, health),
+      ElementsAre("0 sessions", "spea\\u001bker: 34 % of the period, less than 50 % at worst, 2 xruns",
+                  "mic (input): idle, 1 xrun", "", "node    of the period  worst  glitches  process",
+                  "player  12 %           90 %   3         4711"));
+}
+
 TEST(TopFrameTest, GivesProgramsEverything) {
-  EXPECT_EQ(topObject(row(77)).text(),
-            R"({"reporterID":77,"serviceType":2,"serviceName":"telephony","started":true,)"
-            R"("application":"com.example.phone","processIdentifier":11,"processName":"phone","messages":8,)"
-            R"("redundant":2,"seconds":187.9,"messagesPerSecond":12.34,"redundantShare":0.25})");
+  EXPECT_EQ(
+      topObject(row(77)).text(),
+      R"({"reporterID":77,"serviceType":2,"serviceName":"telephony","started":true,)"
+      R"("application":"com.example.phone","processIdentifier":11,"processName":"phone","messages":8,)"
+      R"("redundant":2,"overloads":1,"seconds":187.9,"messagesPerSecond":12.34,"redundantShare":0.25})");
 }
 
 TEST(TopFrameTest, WritesRunningTimesAsPeopleDo) {
