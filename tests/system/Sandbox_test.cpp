@@ -108,6 +108,17 @@ TEST_F(SandboxTest, LeavesTheCommandItsOptions) {
   EXPECT_EQ(output(), "--keep --json -n list\n");
 }
 
+TEST_F(SandboxTest, TakesACommandAfterTwoDashes) {
+  ASSERT_EQ(run({"--", "echo", "--keep", "--", "list"}), 0) << errors();
+  EXPECT_EQ(output(), "--keep -- list\n");
+  EXPECT_EQ(run({"--", "sh", "-c", "exit 7"}), 7);
+  EXPECT_EQ(run({"--json", "--", "./--no-such"}), 127);
+  EXPECT_EQ(run({"--", "--no-such"}), 127);
+  ASSERT_EQ(run({"--", TONEWERK_PLAYER_C}), 0) << errors();
+  EXPECT_THAT(output(), testing::ContainsRegex("longformaudio +org.example.Player +stopped"));
+  EXPECT_THAT(left(), IsEmpty());
+}
+
 TEST_F(SandboxTest, KeepsItsDirectoriesWhenAskedTo) {
   ASSERT_EQ(run({"--keep", TONEWERK_PLAYER_C}), 0);
   ASSERT_EQ(left().size(), 1U);

@@ -32,6 +32,8 @@ struct Tool {
   int inDescriptor = -1;       // the descriptor to read keys from; -1 for none
   int outDescriptor = -1;      // the descriptor of `out`; -1 when it is not a file
   int status = kDone;          // the exit status of the command that ran
+  // The command line of another program that `twctl sandbox` is to run.
+  std::vector<std::string> foreignWords = {};
 
   // Prints "twctl: <problem>" and returns `failure`. Escapes what the problem repeats of other programs' and
   // users' words.

@@ -2,12 +2,33 @@
 #include "tools/twctl/commands/Commands.h"
 
 #include <CLI/CLI.hpp>
+#include <algorithm>
 #include <exception>
+#include <string>
+#include <utility>
+#include <vector>
 
 #include "tools/twctl/commands/CompletionCommand.h"
+#include "tools/twctl/completion/CompletionPoint.h"
 #include "tools/twctl/input/UsageProblem.h"
 
 namespace tonewerk {
+namespace {
+
+// Parses the tool's own words. Another program's command line is set aside unread, whatever it looks like.
+void parse(CLI::App& app, Tool& tool, int argc, const char* const* argv) {
+  std::vector<std::string> words(argv + std::min(argc, 1), argv + argc);
+  if (const auto place = foreignCommandIn(app, words)) {
+    const auto foreign = words.begin() + static_cast<std::ptrdiff_t>(*place);
+    tool.foreignWords.assign(foreign, words.end());
+    words.erase(foreign, words.end());
+    if (words.back() == "--") words.pop_back();
+  }
+  std::reverse(words.begin(), words.end());  // as the parser wants them
+  app.parse(std::move(words));
+}
+
+}  // namespace
 
 CLI::App& addCommand(CLI::App& app, Tool& tool, const std::string& name, const std::string& description) {
   CLI::App& command = *app.add_subcommand(name, description);
@@ -61,7 +82,7 @@ int runCommandLine(int argc, const char* const* argv, Tool& tool) {
       answerCompletion(app, tool, *question);
       return tool.status;
     }
-    app.parse(argc, argv);
+    parse(app, tool, argc, argv);
   } catch (const CLI::ParseError& error) {
     // The parser reports --help and --version in this way, too.
     const bool isAnswer = error.get_exit_code() == 0;

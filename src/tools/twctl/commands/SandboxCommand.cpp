@@ -85,11 +85,13 @@ void showReports(Tool& tool, const std::string& stateDirectory) {
   if (isFirst) tool.warn("no session was reported");
 }
 
-int runSandbox(Tool& tool, bool isKept, const std::vector<std::string>& given) {
+// `unread` are words before the command, which the parser does not know.
+int runSandbox(Tool& tool, bool isKept, const std::vector<std::string>& unread) {
   if (tool.systemWide)
     return tool.fail(kWrongUsage, "--system excludes sandbox, which has directories of its own");
-  if (!given.empty() && given.front().starts_with('-'))
-    return tool.fail(kWrongUsage, "unknown option '" + given.front() + "'");
+  if (!unread.empty() && unread.front() != "--")
+    return tool.fail(kWrongUsage, "unknown option '" + unread.front() + "'");
+  const std::vector<std::string>& given = tool.foreignWords;
   const std::vector<std::string> command = commandOr(given);
   Sandbox sandbox(daemonProgram());
   if (isKept) sandbox.keep();
@@ -114,7 +116,7 @@ void addSandboxCommand(CLI::App& app, Tool& tool) {
   CLI::App& command =
       addCommand(app, tool, "sandbox", "Runs a command with a daemon of its own, and shows its reports");
   command.footer(
-      "twctl sandbox [--keep] [--json] [COMMAND [ARGUMENT...]]\n"
+      "twctl sandbox [--keep] [--json] [--] [COMMAND [ARGUMENT...]]\n"
       "  twctl sandbox ./player          a program that reports, its sessions and summaries\n"
       "  twctl sandbox                   a shell, in which programs and twctl use that daemon\n"
       "The daemon has directories of its own and no D-Bus; they are removed at the end. It needs no rights.\n"

@@ -155,6 +155,14 @@ CompletionPoint completionPointOf(const CLI::App& app, const std::vector<std::st
   return point;
 }
 
+std::optional<std::size_t> foreignCommandIn(const CLI::App& app, const std::vector<std::string>& words) {
+  Walk walk(app);
+  for (std::size_t place = 0; place < words.size(); ++place) {
+    if (walk.takesForeignWords() || !walk.pass(words[place])) return place;
+  }
+  return std::nullopt;
+}
+
 std::vector<Candidate> candidatesOfTree(const CompletionPoint& point) {
   std::vector<Candidate> candidates;
   if (point.kind == Kind::kOption) {

@@ -103,6 +103,15 @@ TEST_F(CompletionPointTest, KnowsWhereAnotherProgramBegins) {
   EXPECT_THAT(offered({"sandbox", "--k"}), ElementsAre("--keep"));
 }
 
+TEST_F(CompletionPointTest, FindsTheCommandLineOfAnotherProgram) {
+  EXPECT_EQ(foreignCommandIn(app, {"sandbox", "--keep", "./player", "--keep"}), 2U);
+  EXPECT_EQ(foreignCommandIn(app, {"--system", "sandbox", "--", "--", "x"}), 3U);
+  EXPECT_EQ(foreignCommandIn(app, {"sandbox"}), std::nullopt);
+  EXPECT_EQ(foreignCommandIn(app, {"sandbox", "--"}), std::nullopt);
+  EXPECT_EQ(foreignCommandIn(app, {"defaults", "read", "--", "sandbox", "x"}), std::nullopt);
+  EXPECT_EQ(foreignCommandIn(app, {}), std::nullopt);
+}
+
 TEST_F(CompletionPointTest, KnowsWhoseDaemonIsMeant) {
   EXPECT_TRUE(at({"--system", "top", ""}).systemWide);
   EXPECT_FALSE(at({"top", ""}).systemWide);
