@@ -25,8 +25,9 @@ struct Tool {
   std::ostream& out;
   std::ostream& err;
   const JsonService& json;
-  bool asJson = false;      // --json
-  bool systemWide = false;  // --system
+  bool asJson = false;        // --json
+  bool systemWide = false;    // --system
+  bool isUtc = false;         // --utc; the process then has that time zone
   bool outIsTerminal = false;
   std::istream* in = nullptr;  // standard input, for whole texts; null for none
   int inDescriptor = -1;       // the descriptor to read keys from; -1 for none

@@ -10,13 +10,14 @@
 #include <vector>
 
 #include "platform/linux/json/NlohmannJsonService.h"
+#include "support/ScopedTimeZone.h"
 #include "support/TemporaryDirectory.h"
 #include "tools/twctl/ScriptedDaemon.h"
 #include "tools/twctl/commands/Commands.h"
 
 namespace tonewerk {
 
-// Runs twctl with its own directories and socket.
+// Runs twctl with its own directories and socket, in UTC.
 class CommandLineTest : public testing::Test {
  protected:
   CommandLineTest() {
@@ -52,6 +53,7 @@ class CommandLineTest : public testing::Test {
     return directory_.path(name);
   }
 
+  const ScopedTimeZone zone_{"UTC0"};
   TemporaryDirectory directory_;
   const std::string socket_ = directory_.path("reporting.sock");
   NlohmannJsonService json_;

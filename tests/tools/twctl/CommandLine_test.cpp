@@ -446,8 +446,8 @@ TEST_F(EventsCommandTest, ShowsEventsToPeople) {
   store();
   EXPECT_EQ(run({"events", "--name", "*.b"}), kDone);
   EXPECT_EQ(output(),
-            "id  time                    name          payload\n"
-            "4   2025-11-20T10:18:10.5Z  com.orvane.b  {\"n\":2}\n");
+            "id  time                      name          payload\n"
+            "4   2025-11-20 10:18:10.500Z  com.orvane.b  {\"n\":2}\n");
 }
 
 TEST_F(EventsCommandTest, GivesEventsToPrograms) {
@@ -506,10 +506,10 @@ TEST_F(MetricsCommandTest, ShowsRecordsDecodedAndOthersInHexadecimal) {
   EXPECT_EQ(run({"metrics"}), kDone);
   EXPECT_EQ(output(),
             "id  time                  identifier  record\n"
-            "1   2025-11-20T10:18:01Z  5963779     "
+            "1   2025-11-20 10:18:01Z  5963779     "
             "{\"duration\":3,\"issuetype\":\"silence\",\"node\":\"mixer\",\"rtaidclient\":\"\"}\n"
-            "2   2025-11-20T10:18:03Z  7           1003\n"
-            "3   2025-11-20T10:18:04Z  5963779     1a09\n");
+            "2   2025-11-20 10:18:03Z  7           1003\n"
+            "3   2025-11-20 10:18:04Z  5963779     1a09\n");
 }
 
 TEST_F(MetricsCommandTest, GivesRecordsToProgramsByTheFilter) {
@@ -557,12 +557,12 @@ TEST_F(PowerCommandTest, ShowsEventsAndTheTotalsOfTheirDurationsToPeople) {
   EXPECT_EQ(run({"power", "--limit", "4"}), kDone);
   EXPECT_EQ(output(),
             "id  time                  group  name                             payload\n"
-            "3   2025-11-20T10:18:03Z  28     Flumen_Haptics_EngineOnDuration  "
+            "3   2025-11-20 10:18:03Z  28     Flumen_Haptics_EngineOnDuration  "
             "{\"EngineOnDuration\":7,\"ApplicationName\":\"chat\"}\n"
-            "4   2025-11-20T10:18:05Z  28     Flumen_Haptics_EngineOnDuration  "
+            "4   2025-11-20 10:18:05Z  28     Flumen_Haptics_EngineOnDuration  "
             "{\"EngineOnDuration\":2,\"ApplicationName\":\"game\"}\n"
-            "5   2025-11-20T10:18:07Z  28     Flumen_Haptics_EngineOnDuration  {\"EngineOnDuration\":0.25}\n"
-            "6   2025-11-20T10:18:08Z  28     LeakedHapticsSessionInfo         "
+            "5   2025-11-20 10:18:07Z  28     Flumen_Haptics_EngineOnDuration  {\"EngineOnDuration\":0.25}\n"
+            "6   2025-11-20 10:18:08Z  28     LeakedHapticsSessionInfo         "
             "{\"Haptic_Active_Hardware_Time_Seconds\":3600}\n"
             "\n"
             "ApplicationName  EngineOnDuration  events\n"
@@ -593,7 +593,7 @@ TEST_F(PowerCommandTest, ShowsNoTotalsWhereNoEventHasADuration) {
   EXPECT_EQ(run({"power", "--name", "*Status"}), kDone);
   EXPECT_EQ(output(),
             "id  time                  group  name                         payload\n"
-            "2   2025-11-20T10:18:02Z  28     Flumen_Haptics_ClientStatus  "
+            "2   2025-11-20 10:18:02Z  28     Flumen_Haptics_ClientStatus  "
             "{\"Status\":true,\"ApplicationName\":\"game\"}\n");
 }
 

@@ -3,7 +3,10 @@
 
 #include <CLI/CLI.hpp>
 #include <algorithm>
+#include <cstdlib>
+#include <ctime>
 #include <exception>
+#include <optional>
 #include <string>
 #include <utility>
 #include <vector>
@@ -28,6 +31,33 @@ void parse(CLI::App& app, Tool& tool, int argc, const char* const* argv) {
   app.parse(std::move(words));
 }
 
+// Gives the process its time zone back: --utc is for one command line.
+class KeptTimeZone {
+ public:
+  explicit KeptTimeZone(const Tool& tool) : tool_(tool) {
+    if (const char* zone = std::getenv("TZ")) before_ = zone;
+  }
+  KeptTimeZone(const KeptTimeZone&) = delete;
+  KeptTimeZone& operator=(const KeptTimeZone&) = delete;
+  ~KeptTimeZone() {
+    if (!tool_.isUtc) return;
+    before_ ? ::setenv("TZ", before_->c_str(), 1) : ::unsetenv("TZ");
+    ::tzset();
+  }
+
+ private:
+  const Tool& tool_;
+  std::optional<std::string> before_;
+};
+
+// The zone of the process, so that every time that is shown, read or counted by days follows it, in the
+// libraries, too. Nothing else runs yet.
+void useUtc(Tool& tool) {
+  tool.isUtc = true;
+  ::setenv("TZ", "UTC0", 1);
+  ::tzset();
+}
+
 }  // namespace
 
 CLI::App& addCommand(CLI::App& app, Tool& tool, const std::string& name, const std::string& description) {
@@ -39,9 +69,12 @@ CLI::App& addCommand(CLI::App& app, Tool& tool, const std::string& name, const s
 void addCommonOptions(CLI::App& app, Tool& tool) {
   app.add_flag("--json", tool.asJson, "One JSON object a line instead of a table");
   app.add_flag("--system", tool.systemWide, "The system's daemon and directories, whoever asks");
+  app.add_flag_callback(
+      "--utc", [&tool] { useUtc(tool); }, "Times in UTC instead of the local zone");
 }
 
 int runCommandLine(int argc, const char* const* argv, Tool& tool) {
+  const KeptTimeZone zone(tool);
   CLI::App app("Talks to the reporting daemon, and reads what it has stored.", "twctl");
   app.set_version_flag("--version", std::string("twctl ") + TONEWERK_VERSION);
   app.footer(

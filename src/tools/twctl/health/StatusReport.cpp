@@ -6,7 +6,6 @@
 #include <cmath>
 #include <cstdint>
 #include <cstdio>
-#include <ctime>
 #include <ostream>
 #include <string_view>
 #include <utility>
@@ -14,6 +13,7 @@
 #include "protocol/WatchKeys.h"
 #include "tools/twctl/health/WrappedLines.h"
 #include "tools/twctl/show/AccountTable.h"
+#include "tools/twctl/show/LocalTime.h"
 #include "tools/twctl/show/SinkTable.h"
 #include "tools/twctl/show/Table.h"
 #include "tools/twctl/show/UserName.h"
@@ -85,7 +85,7 @@ void printDaemon(const StatusReport& report, WrappedLines& lines) {
   lines.add("daemon", "version " + daemon.text(kWatchKeyVersion) + ", process " +
                           daemon.text(kWatchKeyProcessIdentifier) + " of " +
                           userName(static_cast<std::uint64_t>(daemon.integer(kWatchKeyUser))));
-  lines.add("", "since " + localTimeOf(report.now - seconds) + ", for " + durationText(seconds));
+  lines.add("", "since " + localSecond(report.now - seconds) + ", for " + durationText(seconds));
   lines.add("mode", std::string(textOfMode(daemonMode(daemon))) +
                         (daemon.boolean(kWatchKeyInternalBuild) ? "; an internal build" : ""));
 }
@@ -148,7 +148,7 @@ void printTroubles(const ValueArray& troubles, WrappedLines& lines, std::ostream
     if (times > 1) text += " (" + std::to_string(times) + " times)";
     if (trouble.contains(kWatchKeyUser))
       text += " (by " + userName(static_cast<std::uint64_t>(trouble.integer(kWatchKeyUser))) + ")";
-    lines.add(localTimeOf(trouble.number(kWatchKeyTime)), text);
+    lines.add(localSecond(trouble.number(kWatchKeyTime)), text);
   }
 }
 
@@ -215,7 +215,7 @@ void StatusReport::print(std::ostream& out, std::optional<std::size_t> width) co
     printEndpoints(*daemon.endpoints, out, width);
   }
   if (daemon.troubles && !daemon.troubles->empty()) {
-    WrappedLines troubles(out, 19, width);
+    WrappedLines troubles(out, 20, width);
     printTroubles(*daemon.troubles, troubles, out);
   }
   out << '\n';
@@ -254,16 +254,6 @@ std::string durationText(double seconds) {
   if (seconds < kDay)
     return whole(seconds / kHour) + " h " + whole(std::fmod(seconds, kHour) / kMinute) + " min";
   return whole(seconds / kDay) + " d " + whole(std::fmod(seconds, kDay) / kHour) + " h";
-}
-
-std::string localTimeOf(double time) {
-  const auto seconds = static_cast<std::time_t>(time);
-  std::tm parts{};
-  std::array<char, 32> text{};
-  if (localtime_r(&seconds, &parts) == nullptr ||
-      std::strftime(text.data(), text.size(), "%Y-%m-%d %H:%M:%S", &parts) == 0)
-    return whole(time);
-  return text.data();
 }
 
 }  // namespace tonewerk

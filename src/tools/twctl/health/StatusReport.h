@@ -45,7 +45,4 @@ std::string sizeText(double bytes);
 // "3 d 4 h", "2 min"
 std::string durationText(double seconds);
 
-// "2026-11-23 14:02:11", in local time.
-std::string localTimeOf(double time);
-
 }  // namespace tonewerk

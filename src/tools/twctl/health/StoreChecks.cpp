@@ -10,6 +10,7 @@
 #include "protocol/WatchKeys.h"
 #include "tools/twctl/health/Checkup.h"
 #include "tools/twctl/health/StatusReport.h"
+#include "tools/twctl/show/LocalTime.h"
 #include "tools/twctl/show/UserName.h"
 
 namespace tonewerk {
@@ -74,7 +75,7 @@ void checkErrors(const Checkup& checkup, Findings& findings) {
   for (const ValueMap& line : mapsIn(checkup.daemon.troubles.value_or(ValueArray()))) {
     if (!isRecentTrouble(line, checkup.around.now)) continue;
     errors += line.integer(kWatchKeyTimes);
-    if (newest.empty()) newest = localTimeOf(line.number(kWatchKeyTime)) + " " + line.text(kWatchKeyText);
+    if (newest.empty()) newest = localSecond(line.number(kWatchKeyTime)) + " " + line.text(kWatchKeyText);
   }
   if (errors == 0) return;
   findings.add("logged-errors",
@@ -87,7 +88,7 @@ void checkErrors(const Checkup& checkup, Findings& findings) {
 
 void checkClock(const Checkup& checkup, Findings& findings) {
   const double now = checkup.around.now;
-  if (now < kEarliest) findings.add("unset-clock", "the clock shows " + localTimeOf(now));
+  if (now < kEarliest) findings.add("unset-clock", "the clock shows " + localSecond(now));
   const ValueMap& daemon = checkup.daemon.daemon;
   if (daemon.contains(kWatchKeyStartedAt)) {
     const double jump = now - daemon.number(kWatchKeyStartedAt) - daemon.number(kWatchKeySeconds);
@@ -98,8 +99,8 @@ void checkClock(const Checkup& checkup, Findings& findings) {
                    kSetClock);
   }
   if (checkup.store.newestAt && *checkup.store.newestAt > now + kMaxFutureSeconds)
-    findings.add("future-reports", "the newest report is of " + localTimeOf(*checkup.store.newestAt) +
-                                       ", and the clock shows " + localTimeOf(now));
+    findings.add("future-reports", "the newest report is of " + localSecond(*checkup.store.newestAt) +
+                                       ", and the clock shows " + localSecond(now));
 }
 
 void checkStore(const Checkup& checkup, Findings& findings) {

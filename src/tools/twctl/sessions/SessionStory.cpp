@@ -7,6 +7,7 @@
 #include <string_view>
 
 #include "tools/recording/ReasonKeys.h"
+#include "tools/twctl/show/LocalTime.h"
 #include "tools/twctl/show/TopFrame.h"
 #include "values/Utf8.h"
 
@@ -104,9 +105,9 @@ void SessionStory::head(std::string& text) const {
                      ") for " + session_.service.value_or("an unknown service") + ", reporter " +
                      std::to_string(session_.reporterID) + ".";
   add(text, line);
-  line = "It began at " + textOf(Date{session_.startedAt});
+  line = "It began at " + localTime(session_.startedAt);
   if (session_.endedAt) {
-    line += " and ended at " + textOf(Date{*session_.endedAt}) + ", after " +
+    line += " and ended at " + localTime(*session_.endedAt) + ", after " +
             runningTime(*session_.endedAt - session_.startedAt) + ": " + endingText(session_) + ".";
   } else {
     line += " and has not ended.";
@@ -374,7 +375,7 @@ std::string SessionStory::summaries(const std::string& category) const {
 std::string SessionStory::event(const StoredEventRow& event) const {
   std::string text;
   add(text, "Event " + std::to_string(event.id) + ": " + event.category + " " + event.type + " of session " +
-                std::to_string(session_.id) + ", recorded at " + textOf(Date{event.at}) + ", " +
+                std::to_string(session_.id) + ", recorded at " + localTime(event.at) + ", " +
                 (event.source == "derived" ? "made by the daemon" : "sent by a client") + ".");
   if (life_ == nullptr) {
     unknownReasons(text);

@@ -7,6 +7,7 @@
 
 #include "tools/twctl/Tool.h"
 #include "tools/twctl/show/ChannelText.h"
+#include "tools/twctl/show/LocalTime.h"
 #include "tools/twctl/show/Table.h"
 #include "values/PrintableText.h"
 
@@ -44,7 +45,7 @@ void ChannelPrinter::printChanges(double at) {
   if (!changes) return;
   if (!tool_.asJson) {
     if (tool_.outIsTerminal) tool_.out << kClearTerminal;
-    tool_.out << textOf(Date{at}) << '\n';
+    tool_.out << localTime(at) << '\n';
   }
   const std::size_t count = print(*changes, at);
   if (!tool_.asJson) tool_.out << (count == 0 ? "nothing changed\n\n" : "\n");

@@ -7,6 +7,7 @@
 #include "protocol/EventTexts.h"
 #include "protocol/WatchKeys.h"
 #include "tools/twctl/Tool.h"
+#include "tools/twctl/show/LocalTime.h"
 #include "values/PrintableText.h"
 
 namespace tonewerk {
@@ -27,7 +28,7 @@ std::string serviceNameOf(const ValueMap& message) {
 }
 
 std::string lineOf(const ValueMap& message) {
-  std::string line = textOf(Date{message.number(kWatchKeyTime)});
+  std::string line = localTime(message.number(kWatchKeyTime));
   line += "  " + message.text(kWatchKeyReporterID);
   line += "  " + serviceNameOf(message);
   line += "  " + categoryNameOf(message) + "/" + typeNameOf(message);

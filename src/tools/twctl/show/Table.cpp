@@ -5,6 +5,7 @@
 #include <ostream>
 #include <utility>
 
+#include "tools/twctl/show/LocalTime.h"
 #include "values/CompactJson.h"
 #include "values/PrintableText.h"
 #include "values/Utf8.h"
@@ -35,7 +36,7 @@ std::string cut(const std::string& text, std::size_t width) {
 
 Table::Cell::Cell(const Value& value) : text(value.text()), json(jsonOf(value)) {}
 
-Table::Cell Table::Cell::time(double seconds) { return {textOf(Date{seconds}), jsonOf(Value(seconds))}; }
+Table::Cell Table::Cell::time(double seconds) { return {localTime(seconds), jsonOf(Value(seconds))}; }
 
 Table::Table(std::ostream& out, bool asJson, std::vector<std::string> columns)
     : out_(out), asJson_(asJson), columns_(std::move(columns)) {

@@ -34,7 +34,7 @@ class Table {
     std::string text;  // for people
     std::string json;  // for programs, a JSON value
     Cell(const Value& value);
-    // Makes a cell of seconds since 1970: RFC 3339 for people, the number for programs.
+    // Makes a cell of seconds since 1970: the local time for people (LocalTime.h), the number for programs.
     static Cell time(double seconds);
     Cell(std::string shown, std::string written) : text(std::move(shown)), json(std::move(written)) {}
   };

@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "tools/twctl/input/Suggestion.h"
+#include "tools/twctl/show/LocalTime.h"
 #include "tools/twctl/show/Table.h"
 #include "tools/twctl/sql/SqlCompletion.h"
 #include "tools/twctl/sql/StoreNames.h"
@@ -71,7 +72,7 @@ void SqlPrompt::run(const Format& format, const Run& runStatement) {
 void SqlPrompt::greet() const {
   const std::optional<StoreSpan> span = spanOf(reader_);
   tool_.out << printable(path_) << ", "
-            << (span ? "from " + textOf(Date{span->from}) + " to " + textOf(Date{span->until})
+            << (span ? "from " + localTime(span->from) + " to " + localTime(span->until)
                      : std::string("nothing recorded yet"))
             << "\nOnly reading is possible. .help explains, .tables lists the views, .quit ends.\n";
 }

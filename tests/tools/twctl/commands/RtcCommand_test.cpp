@@ -73,7 +73,7 @@ TEST_F(RtcCommandTest, ShowsSessionsAndThenMessagesToPeople) {
   const std::size_t messages = output().find("category");
   EXPECT_LT(sessions, messages);
   EXPECT_NE(messages, std::string::npos);
-  EXPECT_THAT(output(), HasSubstr("2025-11-20T10:18:00.5Z"));
+  EXPECT_THAT(output(), HasSubstr("2025-11-20 10:18:00.500Z"));
   EXPECT_THAT(output(), HasSubstr(R"({"of":"vocia"})"));
 }
 

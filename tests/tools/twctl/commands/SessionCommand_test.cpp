@@ -34,7 +34,7 @@ TEST_F(SessionCommandTest, TellsWhatTheStoreKnowsWithoutAJournal) {
   EXPECT_THAT(output(),
               StartsWith("Session 2: Melody\\u001b[31m (process player, user 1000) for longformaudio, "
                          "reporter 1002.\n"
-                         "It began at 2026-11-20T00:00:00Z and ended at 2026-11-20T01:00:00Z, after "
+                         "It began at 2026-11-20 00:00:00Z and ended at 2026-11-20 01:00:00Z, after "
                          "1:00:00: it was stopped.\n"
                          "10 messages, 2 of them redundant; 0 overloads; 3600 s active.\n"));
   EXPECT_THAT(output(), HasSubstr("The reasons are not known: there is no journal.\n"));
@@ -70,7 +70,7 @@ TEST_F(SessionCommandTest, SaysWhichEventIsNotThere) {
 TEST_F(SessionCommandTest, ExplainsWhatItCanAndFails) {
   EXPECT_EQ(run({"explain", "7"}), kRefused);
   EXPECT_EQ(output(),
-            "Event 7: Volume Summary of session 2, recorded at 2026-11-20T01:00:00Z, made by the daemon.\n"
+            "Event 7: Volume Summary of session 2, recorded at 2026-11-20 01:00:00Z, made by the daemon.\n"
             "The reasons are not known: there is no journal.\n");
 }
 

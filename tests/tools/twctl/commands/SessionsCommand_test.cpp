@@ -44,10 +44,25 @@ class SessionsCommandTest : public CommandLineTest {
 
 TEST_F(SessionsCommandTest, PrintsTheNewestLast) {
   EXPECT_EQ(run({"sessions"}), kDone);
-  EXPECT_THAT(output(), HasSubstr("\n1   2026-11-20T01:00:00Z  1:00 "));
+  EXPECT_THAT(output(), HasSubstr("\n1   2026-11-20 01:00:00Z  1:00 "));
   EXPECT_THAT(output(), HasSubstr("running"));
   EXPECT_THAT(errors(), IsEmpty());
   EXPECT_EQ(idsOf({}), "2 1 3 ");
+}
+
+// The zone of whoever asks, unless UTC is asked for; what is asked for ends with the command line.
+TEST_F(SessionsCommandTest, ShowsAndTakesLocalTimesOrUtc) {
+  const ScopedTimeZone zone("CET-1");
+  EXPECT_EQ(run({"sessions"}), kDone);
+  EXPECT_THAT(output(), HasSubstr("\n1   2026-11-20 02:00:00  1:00 "));
+  EXPECT_EQ(idsOf({"--until", "2026-11-20 02:00"}), "2 1 ");
+  EXPECT_EQ(run({"sessions", "--utc"}), kDone);
+  EXPECT_THAT(output(), HasSubstr("\n1   2026-11-20 01:00:00Z  1:00 "));
+  EXPECT_EQ(idsOf({"--utc", "--until", "2026-11-20 01:00"}), "2 1 ");
+  EXPECT_EQ(run({"--utc", "sessions"}), kDone);
+  EXPECT_THAT(output(), HasSubstr("\n1   2026-11-20 01:00:00Z  1:00 "));
+  EXPECT_EQ(run({"sessions"}), kDone);
+  EXPECT_THAT(output(), HasSubstr("\n1   2026-11-20 02:00:00  1:00 "));
 }
 
 TEST_F(SessionsCommandTest, KeepsTheNewestSoMany) { EXPECT_EQ(idsOf({"-n", "2"}), "1 3 "); }

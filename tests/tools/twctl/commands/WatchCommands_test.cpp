@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "platform/linux/json/NlohmannJsonService.h"
+#include "support/ScopedTimeZone.h"
 #include "support/TemporaryDirectory.h"
 #include "tools/twctl/ScriptedDaemon.h"
 #include "tools/twctl/commands/Commands.h"
@@ -25,6 +26,7 @@ const ReplyError kRefusal = messagingError(kNotPermitted, "not permitted: this i
 
 class WatchCommandsTest : public testing::Test {
  protected:
+  const ScopedTimeZone zone_{"UTC0"};
   WatchCommandsTest() { setenv("TONEWERK_REPORTING_SOCKET", socket.c_str(), 1); }
   void TearDown() override { unsetenv("TONEWERK_REPORTING_SOCKET"); }
 
@@ -163,7 +165,7 @@ TEST_F(WatchCommandsTest, BothRefuseWrongUsage) {
 TEST_F(WatchCommandsTest, TailPrintsSoManyMessagesAndWhatWasMissedBeforeThem) {
   answerMessages(3, {message(1), message(2)});
   EXPECT_EQ(run({"tail", "--count", "3"}), kDone);
-  const std::string line = "2025-11-20T10:20:00.5Z  77  telephony  Playback/Start  ";
+  const std::string line = "2025-11-20 10:20:00.500Z  77  telephony  Playback/Start  ";
   EXPECT_EQ(out.str(), "... missed 3 messages\n" + line + "{\"number\":1}\n" + line + "{\"number\":2}\n" +
                            "... missed 3 messages\n" + line + "{\"number\":1}\n");
 }

@@ -9,6 +9,7 @@
 #include <time.h>
 #include <unistd.h>
 
+#include "support/ScopedTimeZone.h"
 #include "values/Utf8.h"
 
 namespace tonewerk {
@@ -24,6 +25,7 @@ constexpr double kNow = 1'800'000'000.0;  // 2027-01-15 08:00 UTC
 // A daemon with which nothing is wrong.
 class StatusReportTest : public testing::Test {
  protected:
+  const ScopedTimeZone zone_{"UTC0"};
   StatusReportTest() {
     setenv("TZ", "UTC", 1);
     tzset();
@@ -77,7 +79,7 @@ TEST_F(StatusReportTest, ShowsHowTheDaemonAndWhatBelongsToItStand) {
   EXPECT_EQ(
       printed(),
       "daemon    version 1.0, process 42 of 3999999\n"
-      "          since 2027-01-15 05:59:00, for 2 h 1 min\n"
+      "          since 2027-01-15 05:59:00Z, for 2 h 1 min\n"
       "mode      the system's daemon\n"
       "store     /var/lib/tonewerk/reports.db\n"
       "          10.0 MiB of at most 256.0 MiB; the oldest report is 5 d 0 h old; grows by 2.0 MiB a day\n"
@@ -126,7 +128,7 @@ TEST_F(StatusReportTest, CountsAsWrongAnEndpointThatDoesNotTakeRecords) {
 TEST_F(StatusReportTest, CountsAsWrongTheDaemonsOwnErrorsOfTheLastHour) {
   trouble(kNow - 3599);
   EXPECT_THAT(report.problems(), ElementsAre("the daemon has logged 3 errors in the last hour"));
-  EXPECT_THAT(printed(), HasSubstr("2027-01-15 07:00:01  cannot write (3 times)\n"));
+  EXPECT_THAT(printed(), HasSubstr("2027-01-15 07:00:01Z  cannot write (3 times)\n"));
   trouble(kNow - 3601);
   EXPECT_THAT(report.problems(), IsEmpty());
   EXPECT_THAT(printed(), HasSubstr("cannot write")) << "older ones are still shown";

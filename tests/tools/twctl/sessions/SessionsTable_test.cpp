@@ -5,6 +5,7 @@
 #include <sstream>
 #include <string>
 
+#include "support/ScopedTimeZone.h"
 namespace tonewerk {
 namespace {
 
@@ -29,6 +30,7 @@ StoredSession player() {
 StoredSession running() { return {.id = 42, .reporterID = -8, .user = 1001, .startedAt = kBegin + 10.0}; }
 
 std::string tableOf(std::size_t width) {
+  const ScopedTimeZone zone("UTC0");
   std::ostringstream out;
   {
     SessionsTable table(out, false, kBegin + 100.0, width);
@@ -43,17 +45,17 @@ TEST(SessionsTableTest, HasAllColumnsWhereThereIsRoom) {
       tableOf(200),
       "id  began                 length   application         service        ending   messages  redundant  "
       "overloads  reporter\n"
-      "41  2025-11-20T10:18:00Z  1:02:03  org.example.Player  longformaudio  stopped  120       14         "
+      "41  2025-11-20 10:18:00Z  1:02:03  org.example.Player  longformaudio  stopped  120       14         "
       "2          7\n"
-      "42  2025-11-20T10:18:10Z  1:30     -                   -              running  -         -          "
+      "42  2025-11-20 10:18:10Z  1:30     -                   -              running  -         -          "
       "-          -8\n");
 }
 
 TEST(SessionsTableTest, KeepsTheImportantColumnsInANarrowTerminal) {
   EXPECT_EQ(tableOf(60),
             "id  began                 length   application\n"
-            "41  2025-11-20T10:18:00Z  1:02:03  org.example.Player\n"
-            "42  2025-11-20T10:18:10Z  1:30     -\n");
+            "41  2025-11-20 10:18:00Z  1:02:03  org.example.Player\n"
+            "42  2025-11-20 10:18:10Z  1:30     -\n");
 }
 
 TEST(SessionsTableTest, GivesProgramsTheNamesOfTheView) {

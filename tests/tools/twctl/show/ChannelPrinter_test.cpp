@@ -7,6 +7,7 @@
 
 #include "platform/linux/json/NlohmannJsonService.h"
 #include "support/ChannelRecords.h"
+#include "support/ScopedTimeZone.h"
 #include "support/memory/MemoryChanmeter.h"
 #include "tools/twctl/Tool.h"
 #include "tools/twctl/show/ChannelText.h"
@@ -28,6 +29,7 @@ constexpr double kTime = 1763633880.5;
 
 class ChannelPrinterTest : public testing::Test {
  protected:
+  const ScopedTimeZone zone_{"UTC0"};
   std::string values() {
     out_.str({});
     succeeded_ = printer_.printValues();
@@ -121,11 +123,11 @@ TEST_F(ChannelPrinterTest, PrintsWhatChangedSinceTheLastTimeInABlock) {
   EXPECT_THAT(changes(), IsEmpty());
   chanmeter_.setRecords({simple(speaker("a"), 8), simple(speaker("still"), 1), simple(speaker("new"), 1)});
   EXPECT_EQ(changes(),
-            "2025-11-20T10:18:00.5Z\n"
+            "2025-11-20 10:18:00.500Z\n"
             "driver  group    subgroup  name  value  unit\n"
             "Amp     Speaker            a     7      \n"
             "\n");
-  EXPECT_EQ(changes(), "2025-11-20T10:18:00.5Z\nnothing changed\n\n");
+  EXPECT_EQ(changes(), "2025-11-20 10:18:00.500Z\nnothing changed\n\n");
 }
 
 TEST_F(ChannelPrinterTest, PutsTheTimeIntoEachLineForPrograms) {

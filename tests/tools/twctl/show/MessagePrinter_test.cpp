@@ -5,6 +5,7 @@
 #include <sstream>
 
 #include "platform/linux/json/NlohmannJsonService.h"
+#include "support/ScopedTimeZone.h"
 #include "tools/twctl/Tool.h"
 
 namespace tonewerk {
@@ -12,6 +13,7 @@ namespace {
 
 class MessagePrinterTest : public testing::Test {
  protected:
+  const ScopedTimeZone zone_{"UTC0"};
   MessagePrinterTest() { tool.asJson = false; }
 
   // Returns what was printed since the last call.
@@ -38,14 +40,14 @@ class MessagePrinterTest : public testing::Test {
 
 TEST_F(MessagePrinterTest, PrintsAMessageOnALine) {
   printer.print(message);
-  EXPECT_EQ(printed(), "2025-11-20T10:20:00.5Z  77  telephony  Playback/Start  {\"volume\":0.5}\n");
+  EXPECT_EQ(printed(), "2025-11-20 10:20:00.500Z  77  telephony  Playback/Start  {\"volume\":0.5}\n");
 }
 
 TEST_F(MessagePrinterTest, MarksARedundantOne) {
   message.set("redundant", true);
   printer.print(message);
   EXPECT_EQ(printed(),
-            "2025-11-20T10:20:00.5Z  77  telephony  Playback/Start  (redundant)  {\"volume\":0.5}\n");
+            "2025-11-20 10:20:00.500Z  77  telephony  Playback/Start  (redundant)  {\"volume\":0.5}\n");
 }
 
 TEST_F(MessagePrinterTest, MakesControlCharactersHarmless) {
@@ -53,7 +55,7 @@ TEST_F(MessagePrinterTest, MakesControlCharactersHarmless) {
   message.set("application", "a\xE2\x80\xAE");
   printer.print(message);
   const std::string payload = R"({"k\u007f":"b\u001b[2J\u009b\n"})";
-  EXPECT_EQ(printed(), "2025-11-20T10:20:00.5Z  77  telephony  Playback/Start  " + payload + "\n");
+  EXPECT_EQ(printed(), "2025-11-20 10:20:00.500Z  77  telephony  Playback/Start  " + payload + "\n");
   tool.asJson = true;
   printer.print(message);
   EXPECT_EQ(printed(), R"({"reporterID":77,"serviceType":2,"category":4,"type":1,"redundant":false,)"

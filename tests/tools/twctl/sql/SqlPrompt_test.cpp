@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "platform/linux/json/NlohmannJsonService.h"
+#include "support/ScopedTimeZone.h"
 #include "tools/twctl/sql/StoreFixture.h"
 
 namespace tonewerk {
@@ -38,6 +39,7 @@ class TypedLines final : public LineReader {
 
 class SqlPromptTest : public testing::Test {
  protected:
+  const ScopedTimeZone zone_{"UTC0"};
   SqlPromptTest() {
     fixture.run(
         "CREATE TABLE event_row (id INTEGER PRIMARY KEY, at REAL);"
@@ -70,7 +72,7 @@ TEST_F(SqlPromptTest, SaysWhichFileItReadsAndWhichTimesItHolds) {
   run();
   EXPECT_THAT(
       out.str(),
-      StartsWith("/state/reports.db, from 2025-11-20T10:18:00Z to 2025-11-21T10:18:00.5Z\nOnly reading"));
+      StartsWith("/state/reports.db, from 2025-11-20 10:18:00Z to 2025-11-21 10:18:00.500Z\nOnly reading"));
   EXPECT_EQ(err.str(), "");
 }
 
