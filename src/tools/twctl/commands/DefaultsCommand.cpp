@@ -109,7 +109,7 @@ void read(Tool& tool, const DefaultsOptions& options) {
     return;
   }
   {
-    // The value is last, because it may be long.
+    // The value is last, because it may be long. It is not cut, because all of it counts.
     Table table(tool.out, tool.asJson, {"key", "from", "value"});
     for (const Entry& entry : entries) table.add({Value(entry.key), Value(entry.from), cellOf(entry.value)});
   }

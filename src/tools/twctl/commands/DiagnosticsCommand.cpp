@@ -45,7 +45,8 @@ bool canRead(Tool& tool, const DiagnosticsDirectory& directory, DiagnosticKind k
 void list(Tool& tool, const DiagnosticsCommand& command) {
   const DiagnosticsDirectory directory = directoryOf(tool);
   if (!canRead(tool, directory, command.kind)) return;
-  Table table(tool.out, tool.asJson, {"id", "when", "what", "process", "bytes", "problems"});
+  Table table(tool, {"id", "when", "what", "process", "bytes", "problems"});
+  table.dropWhenNarrow({"problems", "bytes", "process"});
   for (const Entry& entry : directory.list(command.kind)) {
     const auto text = directory.readFile(command.kind, entry.name, kRequestFile);
     const auto summary = DiagnosticSummary::read(command.kind, text.value_or(""));

@@ -18,10 +18,7 @@ namespace {
 
 constexpr std::size_t kLabelWidth = 6;  // "remedy"
 
-WrappedLines linesFor(const Tool& tool) {
-  const auto size = tool.outIsTerminal ? terminalSizeOf(tool.outDescriptor) : std::nullopt;
-  return {tool.out, kLabelWidth, size ? std::optional(size->columns) : std::nullopt};
-}
+WrappedLines linesFor(const Tool& tool) { return {tool.out, kLabelWidth, widthOf(tool)}; }
 
 Checkup makeCheckup(const Tool& tool) {
   Checkup checkup;

@@ -41,9 +41,9 @@ Value decoded(const StoredMetric& metric) {
 }
 
 bool print(Tool& tool, StoreReader& reader, const EventFilter& filter) {
-  Table table(tool.out, tool.asJson,
-              tool.asJson ? std::vector<std::string>{"id", "posted_at", "identifier", "record"}
-                          : std::vector<std::string>{"id", "time", "identifier", "record"});
+  Table table(tool, tool.asJson ? std::vector<std::string>{"id", "posted_at", "identifier", "record"}
+                                : std::vector<std::string>{"id", "time", "identifier", "record"});
+  table.dropWhenNarrow({"identifier", "id"});
   return reader.readMetrics(filter, [&](const StoredMetric& metric) {
     table.add(
         {Value(metric.id), Table::Cell::time(metric.postedAt), Value(metric.identifier), decoded(metric)});

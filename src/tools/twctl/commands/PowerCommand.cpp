@@ -19,9 +19,10 @@ struct PowerOptions {
 };
 
 bool printEvents(Tool& tool, StoreReader& reader, const EventFilter& filter) {
-  Table table(tool.out, tool.asJson,
-              tool.asJson ? std::vector<std::string>{"id", "recorded_at", "event_group", "name", "payload"}
-                          : std::vector<std::string>{"id", "time", "group", "name", "payload"});
+  Table table(tool, tool.asJson
+                        ? std::vector<std::string>{"id", "recorded_at", "event_group", "name", "payload"}
+                        : std::vector<std::string>{"id", "time", "group", "name", "payload"});
+  table.dropWhenNarrow({"group", "id"});
   return reader.readPowerEvents(filter, [&](const StoredPowerEvent& event) {
     // The payload is JSON already.
     table.add({Value(event.id),
@@ -39,7 +40,7 @@ Table::Cell applicationCell(const EngineOnTotal& total) {
 
 // Prints `head` before the first total.
 bool printTotals(Tool& tool, StoreReader& reader, const EventFilter& filter, const std::string& head) {
-  Table table(tool.out, tool.asJson, {"ApplicationName", "EngineOnDuration", "events"});
+  Table table(tool, {"ApplicationName", "EngineOnDuration", "events"});
   bool isFirst = true;
   return reader.readEngineOnTotals(filter, [&](const EngineOnTotal& total) {
     if (isFirst) tool.out << head;

@@ -15,9 +15,8 @@ namespace {
 using Columns = std::vector<std::string>;
 
 bool printSessions(Tool& tool, StoreReader& reader, const EventFilter& filter) {
-  Table table(tool.out, tool.asJson,
-              tool.asJson ? Columns{"id", "started_at", "session_info", "user_info"}
-                          : Columns{"id", "started", "session_info", "user_info"});
+  Table table(tool, tool.asJson ? Columns{"id", "started_at", "session_info", "user_info"}
+                                : Columns{"id", "started", "session_info", "user_info"});
   return reader.readRtcSessions(filter, [&](const StoredRtcSession& session) {
     // Both maps are JSON already.
     table.add({Value(session.id),
@@ -29,9 +28,9 @@ bool printSessions(Tool& tool, StoreReader& reader, const EventFilter& filter) {
 
 // Prints `head` before the first message.
 bool printMessages(Tool& tool, StoreReader& reader, const EventFilter& filter, const std::string& head) {
-  Table table(tool.out, tool.asJson,
-              tool.asJson ? Columns{"id", "sent_at", "rtc_session", "category", "type", "payload"}
-                          : Columns{"id", "sent", "session", "category", "type", "payload"});
+  Table table(tool, tool.asJson ? Columns{"id", "sent_at", "rtc_session", "category", "type", "payload"}
+                                : Columns{"id", "sent", "session", "category", "type", "payload"});
+  table.dropWhenNarrow({"type", "category", "id"});
   bool isFirst = true;
   return reader.readRtcMessages(filter, [&](const StoredRtcMessage& message) {
     if (isFirst) tool.out << head;

@@ -45,9 +45,7 @@ bool find(Tool& tool, SqlReader& reader, std::int64_t id, KnownSession& known) {
 }
 
 SessionStory storyOf(const Tool& tool, const KnownSession& known) {
-  const auto terminal = tool.outIsTerminal ? terminalSizeOf(tool.outDescriptor) : std::nullopt;
-  return SessionStory(known.session, known.records, known.life, known.replay.why(),
-                      terminal ? std::optional(terminal->columns) : std::nullopt);
+  return SessionStory(known.session, known.records, known.life, known.replay.why(), widthOf(tool));
 }
 
 void printLine(Tool& tool, const ValueMap& line) {

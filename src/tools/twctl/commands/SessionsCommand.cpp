@@ -29,10 +29,9 @@ void sessions(Tool& tool, const SessionsOptions& options) {
   SessionFilter filter = options.filter;
   filter.since = range->since;
   filter.until = range->until;
-  const auto terminal = tool.outIsTerminal ? terminalSizeOf(tool.outDescriptor) : std::nullopt;
   const double now =
       std::chrono::duration<double>(std::chrono::system_clock::now().time_since_epoch()).count();
-  SessionsTable table(tool.out, tool.asJson, now, terminal ? std::optional(terminal->columns) : std::nullopt);
+  SessionsTable table(tool.out, tool.asJson, now, widthOf(tool));
   const bool isRead =
       readSessions(reader, filter, text, [&table](const StoredSession& session) { table.add(session); });
   if (!isRead) tool.status = tool.fail(kRefused, text);

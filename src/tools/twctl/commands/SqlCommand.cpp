@@ -36,8 +36,7 @@ RowFormat formatFor(const Tool& tool, bool asCsv) {
                 : tool.asJson ? RowFormat::Kind::kJson
                               : RowFormat::Kind::kTable;
   format.escapes = tool.outIsTerminal;
-  if (const auto size = tool.outIsTerminal ? terminalSizeOf(tool.outDescriptor) : std::nullopt)
-    format.width = size->columns;
+  format.width = widthOf(tool);
   return format;
 }
 

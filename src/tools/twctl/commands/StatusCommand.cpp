@@ -32,8 +32,7 @@ int showStatus(const Tool& tool) {
     appendCompactJson(text, report.forPrograms());
     tool.out << printable(std::move(text)) << '\n';
   } else {
-    const auto size = tool.outIsTerminal ? terminalSizeOf(tool.outDescriptor) : std::nullopt;
-    report.print(tool.out, size ? std::optional(size->columns) : std::nullopt);
+    report.print(tool.out, widthOf(tool));
   }
   if (!report.daemon.isConnected) return tool.fail(kNoDaemon, report.daemon.problem);
   return report.problems().empty() ? kDone : kRefused;

@@ -62,7 +62,8 @@ Chanmeter::Samples ChannelPrinter::takeSamples(std::optional<ChanmeterError>& er
 
 std::size_t ChannelPrinter::print(const ChanmeterSamples& samples, std::optional<double> changedAt) {
   std::size_t count = 0;
-  Table table(tool_.out, false, {"driver", "group", "subgroup", "name", "value", "unit"});
+  Table table(tool_, {"driver", "group", "subgroup", "name", "value", "unit"});
+  table.dropWhenNarrow({"unit", "subgroup", "driver"});
   chanmeter_.iterate(samples, [&](const ChanmeterSample& sample) {
     if (!filter_.fits(sample) || (changedAt && !isChanged(sample))) return 0;
     ++count;

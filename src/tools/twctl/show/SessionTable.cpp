@@ -5,8 +5,7 @@
 
 namespace tonewerk {
 
-SessionTable::SessionTable(const Tool& tool)
-    : table_(tool.out, tool.asJson, {"reporterID", "serviceType", "serviceName"}) {}
+SessionTable::SessionTable(const Tool& tool) : table_(tool, {"reporterID", "serviceType", "serviceName"}) {}
 
 void SessionTable::add(ReporterID reporterID, AudioServiceType serviceType) {
   table_.add({Value(reporterID), Value(serviceType),

@@ -5,6 +5,11 @@
 #include <sstream>
 #include <string>
 
+#include "platform/linux/json/NlohmannJsonService.h"
+#include "support/ScopedVariable.h"
+#include "tools/twctl/TestTerminal.h"
+#include "tools/twctl/Tool.h"
+
 namespace tonewerk {
 namespace {
 
@@ -169,6 +174,72 @@ TEST(TableTest, ShowsPeopleAndProgramsDifferentThingsWhereAsked) {
   Table table(out, true, {"at"});
   table.add({{"yesterday", "5.0"}});
   EXPECT_EQ(out.str(), "{\"at\":5.0}\n");
+}
+
+TEST(TableTest, AlignsWideAndCombiningCharacters) {
+  std::ostringstream out;
+  {
+    Table table(out, false, {"a", "b"});
+    table.add({Value("\u65e5\u672c"), Value(1)});
+    table.add({Value("e\u0301"), Value(2)});
+    table.add({Value("abcd"), Value(3)});
+  }
+  EXPECT_EQ(out.str(), "a     b\n\u65e5\u672c  1\ne\u0301     2\nabcd  3\n");
+}
+
+TEST(TableTest, DoesNotEscapeAgainWhatIsEscaped) {
+  std::ostringstream out;
+  {
+    Table table(out, false, {"a", "b"});
+    table.add({Value("\x1b"), Value("C:\\x20\\dir \ue000")});
+  }
+  EXPECT_EQ(out.str(), "a       b\n\\u001b  C:\\x20\\dir \ue000\n");
+}
+
+TEST(TableTest, ANameOfAColumnControlsNoTerminal) {
+  std::ostringstream out;
+  {
+    Table table(out, false, {"a\x1b[2J", "b"});
+    table.add({Value(1), Value(2)});
+  }
+  EXPECT_EQ(out.str(), "a\\u001b[2J  b\n1           2\n");
+}
+
+// Runs a table for a terminal of 30 columns.
+class ToolTableTest : public testing::Test {
+ protected:
+  std::string printed() {
+    std::ostringstream out;
+    Tool tool{.out = out, .err = out, .json = json_};
+    tool.outIsTerminal = true;
+    tool.outDescriptor = terminal_.descriptor();
+    Table table(tool, {"what", "text"});
+    table.add({Table::Cell(Value("bad")).in(Table::Style::kError), Value("0123456789012345678901234567890")});
+    table.add({Value("good"), Table::Cell(Value("dim")).in(Table::Style::kDim)});
+    table.print();
+    return out.str();
+  }
+
+  const ScopedVariable term_{"TERM", "xterm"};
+  const ScopedVariable colour_{"NO_COLOR", nullptr};
+  TestTerminal terminal_{30, 24};
+  NlohmannJsonService json_;
+};
+
+TEST_F(ToolTableTest, FitsTheTerminalAndColoursWhatStandsOut) {
+  EXPECT_EQ(printed(),
+            "what  text\n"
+            "\x1b[31mbad \x1b[0m  01234567890123456789012\u2026\n"
+            "good  \x1b[2mdim\x1b[0m\n");
+}
+
+TEST_F(ToolTableTest, HasNoColoursWhereTheyAreNotWanted) {
+  {
+    const ScopedVariable none("NO_COLOR", "1");
+    EXPECT_EQ(printed().find('\x1b'), std::string::npos);
+  }
+  const ScopedVariable dumb("TERM", "dumb");
+  EXPECT_EQ(printed().find('\x1b'), std::string::npos);
 }
 
 }  // namespace
