@@ -80,6 +80,7 @@ plays.")
 set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS_PRIVATE_DIRS ${PROJECT_BINARY_DIR}/src)
 set(CPACK_DEBIAN_TOOLS_PACKAGE_DEPENDS "libtwreporting0 ${same_version}, ${curl_package}")
 set(CPACK_DEBIAN_TOOLS_PACKAGE_RECOMMENDS "tonewerk-reporting-daemon")
+set(CPACK_DEBIAN_TOOLS_PACKAGE_SUGGESTS "less")
 
 set(CPACK_DEBIAN_PYTHON_PACKAGE_NAME python3-tonewerk-reporting)
 set(CPACK_DEBIAN_PYTHON_PACKAGE_SECTION python)

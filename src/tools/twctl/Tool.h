@@ -28,6 +28,7 @@ struct Tool {
   bool asJson = false;        // --json
   bool systemWide = false;    // --system
   bool isUtc = false;         // --utc; the process then has that time zone
+  bool withoutPager = false;  // --no-pager
   bool outIsTerminal = false;
   std::istream* in = nullptr;  // standard input, for whole texts; null for none
   int inDescriptor = -1;       // the descriptor to read keys from; -1 for none

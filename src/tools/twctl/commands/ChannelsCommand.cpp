@@ -11,6 +11,7 @@
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/input/ValueArguments.h"
 #include "tools/twctl/show/ChannelPrinter.h"
+#include "tools/twctl/show/PagedOutput.h"
 
 namespace tonewerk {
 namespace {
@@ -38,9 +39,10 @@ void showChannels(Tool& tool, const ChannelsOptions& options) {
   ChannelPrinter printer(tool, chanmeter, options.filter);
   if (options.watches) {
     watch(tool, printer, options.seconds);
-  } else if (!printer.printValues()) {
-    tool.status = kRefused;  // the log has said why
+    return;
   }
+  const PagedOutput pages(tool);
+  if (!printer.printValues()) tool.status = kRefused;  // the log has said why
 }
 
 // Reads the interval. Returns the problem, or an empty text.

@@ -71,6 +71,7 @@ void addCommonOptions(CLI::App& app, Tool& tool) {
   app.add_flag("--system", tool.systemWide, "The system's daemon and directories, whoever asks");
   app.add_flag_callback(
       "--utc", [&tool] { useUtc(tool); }, "Times in UTC instead of the local zone");
+  app.add_flag("--no-pager", tool.withoutPager, "No pager for long output on a terminal");
 }
 
 int runCommandLine(int argc, const char* const* argv, Tool& tool) {

@@ -18,6 +18,7 @@
 #include "tools/twctl/ToolLog.h"
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/input/PreferenceCheck.h"
+#include "tools/twctl/show/PagedOutput.h"
 #include "tools/twctl/show/Table.h"
 
 namespace tonewerk {
@@ -99,6 +100,7 @@ Table::Cell cellOf(const std::optional<Value>& value) {
 }
 
 void read(Tool& tool, const DefaultsOptions& options) {
+  const PagedOutput pages(tool);
   Preferences preferences(tool);
   std::vector<Entry> entries = entriesOf(options.domain, preferences.layersOf(options.domain));
   if (options.key) std::erase_if(entries, [&](const Entry& entry) { return entry.key != *options.key; });
@@ -232,6 +234,7 @@ void describeToPrograms(std::ostream& out, const std::vector<const Preference*>&
 }
 
 void describe(Tool& tool, const DefaultsOptions& options) {
+  const PagedOutput pages(tool);
   std::vector<const Preference*> described;
   for (const std::vector<Preference>* schema : {&preferenceSchema(), &deviceFactSchema()}) {
     for (const Preference& preference : *schema) {

@@ -12,6 +12,7 @@
 #include "platform/linux/diagnostics/DiagnosticsDirectory.h"
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/show/DiagnosticSummary.h"
+#include "tools/twctl/show/PagedOutput.h"
 #include "tools/twctl/show/Table.h"
 #include "values/PrintableText.h"
 #include "values/ShortenedText.h"
@@ -43,6 +44,7 @@ bool canRead(Tool& tool, const DiagnosticsDirectory& directory, DiagnosticKind k
 }
 
 void list(Tool& tool, const DiagnosticsCommand& command) {
+  const PagedOutput pages(tool);
   const DiagnosticsDirectory directory = directoryOf(tool);
   if (!canRead(tool, directory, command.kind)) return;
   Table table(tool, {"id", "when", "what", "process", "bytes", "problems"});
@@ -135,6 +137,7 @@ std::optional<std::string> nameOf(Tool& tool, const DiagnosticsDirectory& direct
 }
 
 void show(Tool& tool, const DiagnosticsCommand& command) {
+  const PagedOutput pages(tool);
   const DiagnosticsDirectory directory = directoryOf(tool);
   const std::optional<std::string> name = nameOf(tool, directory, command);
   if (!name) return;

@@ -10,6 +10,7 @@
 #include "tools/twctl/health/Checkup.h"
 #include "tools/twctl/health/StoreBound.h"
 #include "tools/twctl/health/WrappedLines.h"
+#include "tools/twctl/show/PagedOutput.h"
 #include "tools/twctl/show/Table.h"
 #include "tools/twctl/show/Terminal.h"
 
@@ -64,6 +65,7 @@ void showToPeople(const Tool& tool, const Findings& findings) {
 
 // Prints what there is to find, for people and for the page that explains it.
 void listKinds(const Tool& tool) {
+  const PagedOutput pages(tool);
   if (tool.asJson) {
     Table table(tool.out, true, {"finding", "cause", "why", "remedy"});
     for (const FindingKind& kind : findingKinds())
@@ -80,6 +82,7 @@ void listKinds(const Tool& tool) {
 }
 
 int examine(const Tool& tool) {
+  const PagedOutput pages(tool);
   const Checkup checkup = makeCheckup(tool);
   const Findings findings = checkAll(checkup);
   if (tool.asJson) {

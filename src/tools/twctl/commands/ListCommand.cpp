@@ -5,12 +5,14 @@
 #include "tools/twctl/DaemonCalls.h"
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/commands/SessionLookup.h"
+#include "tools/twctl/show/PagedOutput.h"
 #include "tools/twctl/show/SessionTable.h"
 
 namespace tonewerk {
 namespace {
 
 void list(Tool& tool) {
+  const PagedOutput pages(tool);
   DaemonCalls daemon(tool);
   std::optional<Value> reporters;
   if (!daemon.connect(DaemonCalls::Role::kOnlooker) ||

@@ -10,6 +10,7 @@
 #include "platform/pb/AudioIssueDetected.h"
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/input/EventFilterOptions.h"
+#include "tools/twctl/show/PagedOutput.h"
 #include "tools/twctl/show/Table.h"
 
 namespace tonewerk {
@@ -53,6 +54,7 @@ bool print(Tool& tool, StoreReader& reader, const EventFilter& filter) {
 void metrics(Tool& tool, const EventFilterOptions& options) {
   const auto filter = options.filter(tool);
   if (!filter) return;
+  const PagedOutput pages(tool);
   StoreReader reader;
   if (reader.open(tool.directories().state) != StoreReader::Outcome::kDone || !print(tool, reader, *filter)) {
     tool.status = tool.fail(kRefused, reader.problem());

@@ -8,6 +8,7 @@
 #include "platform/linux/store/StoreReader.h"
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/input/EventFilterOptions.h"
+#include "tools/twctl/show/PagedOutput.h"
 #include "tools/twctl/show/Table.h"
 
 namespace tonewerk {
@@ -58,6 +59,7 @@ bool print(Tool& tool, StoreReader& reader, const EventFilter& filter, bool tota
 void power(Tool& tool, const PowerOptions& options) {
   const auto filter = options.filter.filter(tool);
   if (!filter) return;
+  const PagedOutput pages(tool);
   StoreReader reader;
   if (reader.open(tool.directories().state) != StoreReader::Outcome::kDone ||
       !print(tool, reader, *filter, options.totalsOnly)) {

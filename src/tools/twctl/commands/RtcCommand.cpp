@@ -7,6 +7,7 @@
 #include "platform/linux/store/StoreReader.h"
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/input/EventFilterOptions.h"
+#include "tools/twctl/show/PagedOutput.h"
 #include "tools/twctl/show/Table.h"
 
 namespace tonewerk {
@@ -47,6 +48,7 @@ bool printMessages(Tool& tool, StoreReader& reader, const EventFilter& filter, c
 void rtc(Tool& tool, const EventFilterOptions& options) {
   const auto filter = options.filter(tool);
   if (!filter) return;
+  const PagedOutput pages(tool);
   StoreReader reader;
   if (reader.open(tool.directories().state) != StoreReader::Outcome::kDone ||
       !printSessions(tool, reader, *filter) ||

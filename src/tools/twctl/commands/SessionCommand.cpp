@@ -13,6 +13,7 @@
 #include "tools/twctl/input/ValueArguments.h"
 #include "tools/twctl/sessions/SessionStory.h"
 #include "tools/twctl/sessions/SessionsTable.h"
+#include "tools/twctl/show/PagedOutput.h"
 #include "tools/twctl/show/Terminal.h"
 #include "values/CompactJson.h"
 #include "values/PrintableText.h"
@@ -85,6 +86,7 @@ void printObjects(Tool& tool, const KnownSession& known) {
 }
 
 void session(Tool& tool, std::int64_t id) {
+  const PagedOutput pages(tool);
   SqlReader reader;
   std::string path;
   KnownSession known;
@@ -130,6 +132,7 @@ void printObjects(Tool& tool, const KnownSession& known, const StoredEventRow& e
 }
 
 int explainEvent(Tool& tool, SqlReader& reader, std::int64_t id) {
+  const PagedOutput pages(tool);
   std::string problem;
   const std::optional<StoredEventRow> event = readEvent(reader, id, problem);
   if (!event) return tool.fail(kRefused, problem);
@@ -148,6 +151,7 @@ int explainEvent(Tool& tool, SqlReader& reader, std::int64_t id) {
 }
 
 int explainOfSession(Tool& tool, SqlReader& reader, const ExplainOptions& options) {
+  const PagedOutput pages(tool);
   KnownSession known;
   if (!find(tool, reader, *options.session, known)) return tool.status;
   const SessionStory story = storyOf(tool, known);

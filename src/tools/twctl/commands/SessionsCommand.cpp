@@ -11,6 +11,7 @@
 #include "tools/twctl/input/ValueArguments.h"
 #include "tools/twctl/sessions/SessionsTable.h"
 #include "tools/twctl/sessions/StoredSessions.h"
+#include "tools/twctl/show/PagedOutput.h"
 #include "tools/twctl/show/Terminal.h"
 
 namespace tonewerk {
@@ -26,6 +27,7 @@ void sessions(Tool& tool, const SessionsOptions& options) {
   SqlReader reader;
   std::string text;
   if (!range || !openStoreSql(tool, reader, text)) return;
+  const PagedOutput pages(tool);
   SessionFilter filter = options.filter;
   filter.since = range->since;
   filter.until = range->until;

@@ -13,6 +13,7 @@
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/commands/LiveEvents.h"
 #include "tools/twctl/commands/StoreSql.h"
+#include "tools/twctl/show/PagedOutput.h"
 #include "tools/twctl/show/Terminal.h"
 #include "tools/twctl/sql/EditedLines.h"
 #include "tools/twctl/sql/SqlCompletion.h"
@@ -99,6 +100,7 @@ void sql(Tool& tool, const SqlOptions& options) {
     return;
   }
   if (!query && tool.in != nullptr) query = queryFrom(*tool.in);
+  const PagedOutput pages(tool);
   tool.status = query ? runQuery(tool, reader, *query, formatFor(tool, options.asCsv))
                       : tool.fail(kWrongUsage, "the query has more than 1000000 bytes");
 }
