@@ -4,8 +4,7 @@
 namespace tonewerk {
 namespace {
 
-// The filter's conditions in the queries below. Parameters 2 to 6 are the filter's; parameter 1 is
-// kStoreNamesPerRow.
+// The filter's conditions in the queries below.
 std::string conditions(const EventFilter& filter, const std::string& name, const std::string& recordedAt) {
   std::string sql;
   if (filter.name) sql += " AND " + name + " GLOB ?3";
@@ -21,9 +20,49 @@ std::string limitedById(const std::string& sql, const EventFilter& filter) {
   return "SELECT * FROM (" + sql + " ORDER BY id DESC LIMIT ?6) ORDER BY id";
 }
 
+// Chooses rows by their session. The sessions are found first; their stretches by an index.
+std::string sessionConditions(const EventFilter& filter) {
+  std::string sql;
+  if (filter.session) sql += " AND r.session = ?10";
+  if (!filter.application && !filter.service && !filter.device) return sql;
+  sql += " AND r.session IN (SELECT id FROM session_row WHERE 1";
+  if (filter.application) sql += " AND application GLOB ?7";
+  if (filter.service) sql += " AND coalesce(service, 'unknown') GLOB ?9";
+  if (filter.device) {
+    sql +=
+        " AND id IN (SELECT session FROM analytics_row WHERE began_at IS NOT NULL AND"
+        " payload ->> 'active_devices' GLOB ?8)";
+  }
+  return sql + ")";
+}
+
+constexpr const char* kRtcApplication = "s.user_info ->> 'HostApplicationDisplayID'";
 constexpr const char* kRtcServiceName = "s.user_info ->> 'kLinkReportUserInfoServiceName'";
 
+std::string rtcConditions(const EventFilter& filter, const std::string& time) {
+  std::string sql = conditions(filter, kRtcServiceName, time);
+  if (filter.application) sql.append(" AND ").append(kRtcApplication).append(" GLOB ?7");
+  if (filter.service) sql.append(" AND ").append(kRtcServiceName).append(" GLOB ?9 || '_session'");
+  return sql;
+}
+
 }  // namespace
+
+std::string messageQuery(const EventFilter& filter, bool knowsSessions) {
+  std::string sql = "SELECT r.id AS id, r.recorded_at, n.name, m.name, r.payload, ";
+  sql += knowsSessions ? "r.session, s.application, n.source IS 'derived'" : "NULL, NULL, 0";
+  sql +=
+      " FROM analytics_row AS r CROSS JOIN analytics_name AS n ON n.name_set = r.name_set AND n.position = 0"
+      " LEFT JOIN analytics_name AS m ON m.name_set = r.name_set AND m.position = 1";
+  if (knowsSessions) sql += " LEFT JOIN session_row AS s ON s.id = r.session";
+  sql += " WHERE r.id > ?2";
+  if (filter.name) sql += " AND (n.name GLOB ?3 OR m.name GLOB ?3)";
+  EventFilter unnamed = filter;
+  unnamed.name.reset();
+  sql += conditions(unnamed, "", "r.recorded_at") + sessionConditions(filter);
+  if (!filter.limit) return sql + " ORDER BY r.id";
+  return "SELECT * FROM (" + sql + " ORDER BY r.id DESC LIMIT ?6) ORDER BY id";
+}
 
 // Reads the tables instead of the view, because there the rows after an identifier are found by key.
 std::string eventQuery(const EventFilter& filter) {
@@ -32,15 +71,15 @@ std::string eventQuery(const EventFilter& filter) {
       "payload"
       " FROM analytics_row AS r CROSS JOIN analytics_name AS n ON n.name_set = r.name_set"
       " WHERE r.id >= ?2 / ?1 AND r.id * ?1 + n.position > ?2";
-  sql += conditions(filter, "n.name", "r.recorded_at");
+  sql += conditions(filter, "n.name", "r.recorded_at") + sessionConditions(filter);
   if (!filter.limit) return sql + " ORDER BY r.id, n.position";
   return "SELECT * FROM (" + sql + " ORDER BY r.id DESC, n.position DESC LIMIT ?6) ORDER BY id";
 }
 
 std::string powerQuery(const EventFilter& filter) {
-  const std::string sql =
-      "SELECT id, recorded_at, event_group, name, payload FROM power_event WHERE id > ?2" +
-      conditions(filter, "name", "recorded_at");
+  std::string sql = "SELECT id, recorded_at, event_group, name, payload FROM power_event WHERE id > ?2" +
+                    conditions(filter, "name", "recorded_at");
+  if (filter.application) sql += " AND payload ->> 'ApplicationName' GLOB ?7";
   return limitedById(sql, filter);
 }
 
@@ -55,7 +94,7 @@ std::string metricQuery(const EventFilter& filter) {
 std::string rtcSessionQuery(const EventFilter& filter) {
   const std::string sql =
       "SELECT s.id AS id, s.started_at, s.session_info, s.user_info FROM rtc_session AS s WHERE s.id > ?2";
-  return limitedById(sql + conditions(filter, kRtcServiceName, "s.started_at"), filter);
+  return limitedById(sql + rtcConditions(filter, "s.started_at"), filter);
 }
 
 // A message may still be stored when its session's row has been deleted. It then has no name. Because
@@ -64,7 +103,7 @@ std::string rtcMessageQuery(const EventFilter& filter) {
   const std::string sql =
       "SELECT m.id AS id, m.sent_at, m.rtc_session, m.category, m.type, m.payload"
       " FROM rtc_message AS m LEFT JOIN rtc_session AS s ON s.id = m.rtc_session WHERE m.id > ?2";
-  return limitedById(sql + conditions(filter, kRtcServiceName, "m.sent_at"), filter);
+  return limitedById(sql + rtcConditions(filter, "m.sent_at"), filter);
 }
 
 std::string engineOnQuery(const EventFilter& filter) {

@@ -13,6 +13,7 @@ namespace tonewerk {
 namespace {
 
 constexpr std::chrono::seconds kPatience{5};
+constexpr std::int64_t kFirstWithSessions = 3;  // of the versions of the schema
 
 }  // namespace
 
@@ -32,9 +33,28 @@ StoreReader::Outcome StoreReader::open(const std::string& directory) {
   return openAs(SqliteDatabase::Mode::kImmutable);
 }
 
+bool StoreReader::readMessages(const EventFilter& filter,
+                               const std::function<void(const StoredMessage& message)>& take) {
+  const auto textOrNone = [](const SqliteStatement& row, int column) {
+    return row.isNull(column) ? std::nullopt : std::optional(row.text(column));
+  };
+  return readOfSessions(messageQuery(filter, knowsSessions_), filter, [&](const SqliteStatement& row) {
+    StoredMessage message{.id = row.integer(0),
+                          .recordedAt = row.number(1),
+                          .name = row.text(2),
+                          .secondName = textOrNone(row, 3),
+                          .payload = row.text(4),
+                          .session = std::nullopt,
+                          .application = textOrNone(row, 6),
+                          .isDerived = row.integer(7) != 0};
+    if (!row.isNull(5)) message.session = row.integer(5);
+    take(message);
+  });
+}
+
 bool StoreReader::readEvents(const EventFilter& filter,
                              const std::function<void(const StoredEvent& event)>& take) {
-  return readRows(eventQuery(filter), filter, [&](const SqliteStatement& row) {
+  return readOfSessions(eventQuery(filter), filter, [&](const SqliteStatement& row) {
     take({row.integer(0), row.number(1), row.text(2), row.text(3)});
   });
 }
@@ -76,6 +96,15 @@ bool StoreReader::readRtcMessages(const EventFilter& filter,
   });
 }
 
+bool StoreReader::readOfSessions(const std::string& sql, const EventFilter& filter,
+                                 const std::function<void(const SqliteStatement& row)>& take) {
+  const bool asksForSessions = filter.application || filter.device || filter.service || filter.session;
+  if (knowsSessions_ || !asksForSessions) return readRows(sql, filter, take);
+  problem_ =
+      path_ + ": an earlier version made it, and it does not know sessions before a daemon has used it";
+  return false;
+}
+
 bool StoreReader::readRows(const std::string& sql, const EventFilter& filter,
                            const std::function<void(const SqliteStatement& row)>& take) {
   SqliteStatement select = database_.prepare(sql);
@@ -85,6 +114,10 @@ bool StoreReader::readRows(const std::string& sql, const EventFilter& filter,
   if (filter.since) select.bind(4, *filter.since);
   if (filter.until) select.bind(5, *filter.until);
   if (filter.limit) select.bind(6, *filter.limit);
+  if (filter.application) select.bind(7, std::string_view(*filter.application));
+  if (filter.device) select.bind(8, std::string_view(*filter.device));
+  if (filter.service) select.bind(9, std::string_view(*filter.service));
+  if (filter.session) select.bind(10, *filter.session);
   for (;;) {
     switch (select.step()) {
       case SqliteStatement::Step::kRow:
@@ -108,6 +141,7 @@ StoreReader::Outcome StoreReader::openAs(SqliteDatabase::Mode mode) {
     problem_ = path_ + ": nothing has been stored yet";
     return Outcome::kNoStore;
   }
+  knowsSessions_ = *version >= kFirstWithSessions;
   return Outcome::kDone;
 }
 

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/store/StoreReader.h"
 
+#include <chrono>
 #include <cmath>
 #include <filesystem>
 #include <fstream>
@@ -12,6 +13,9 @@
 #include "platform/Log.h"
 #include "platform/accounts/Accounts.h"
 #include "platform/linux/store/ReportStore.h"
+#include "platform/linux/store/SqliteDatabase.h"
+#include "platform/linux/store/StoreFile.h"
+#include "platform/linux/store/StoreSchema.h"
 #include "support/TemporaryDirectory.h"
 #include "support/manual/ManualClock.h"
 #include "support/memory/MemoryJsonService.h"
@@ -207,6 +211,95 @@ TEST_F(StoreReaderTest, NoticesThatTheFileWasMoved) {
   EXPECT_FALSE(reader_.hasMoved());
   std::filesystem::rename(directory_.path("reports.db"), directory_.path("reports.db.corrupt"));
   EXPECT_TRUE(reader_.hasMoved());
+}
+
+// Runs on a store that has three sessions with messages, and a message without one.
+class StoreReaderSessionsTest : public testing::Test {
+ protected:
+  StoreReaderSessionsTest() {
+    SqliteDatabase database;
+    EXPECT_TRUE(database.open(storeFileIn(directory_.path()).path, SqliteDatabase::Mode::kReadWrite,
+                              std::chrono::seconds(5)));
+    EXPECT_TRUE(database.run(storeSchema()));
+    EXPECT_TRUE(database.run(
+        "INSERT INTO session_row (id, started_at, reporter_id, service, application) VALUES"
+        " (1, 10, 7, 'telephony', 'Phone'), (2, 10, 8, 'longformaudio', 'Melody'), (3, 10, 9, NULL, NULL);"
+        "INSERT INTO analytics_name (name_set, position, name, source) VALUES"
+        " (1, 0, 'tonewerk.Start', 'client'), (1, 1, 'service.Start', 'client'),"
+        " (2, 0, 'tonewerk.Summary', 'derived'), (3, 0, 'alone', 'client');"
+        "INSERT INTO analytics_row (id, recorded_at, name_set, payload, session, began_at, ended_at) VALUES"
+        " (1, 11, 1, '{}', 1, NULL, NULL), (2, 12, 1, '{}', 2, NULL, NULL), (3, 13, 3, '{}', NULL, NULL, "
+        "NULL),"
+        " (4, 14, 2, '{\"active_devices\":\"Speaker\"}', 2, 12, 14), (5, 15, 1, '{}', 3, NULL, NULL);"));
+  }
+
+  std::string idsOf(const EventFilter& filter) {
+    std::string ids;
+    StoreReader reader;
+    EXPECT_EQ(reader.open(directory_.path()), StoreReader::Outcome::kDone) << reader.problem();
+    EXPECT_TRUE(reader.readMessages(filter, [&](const StoredMessage& message) {
+      ids += std::to_string(message.id) + " ";
+    })) << reader.problem();
+    return ids;
+  }
+
+  TemporaryDirectory directory_;
+};
+
+TEST_F(StoreReaderSessionsTest, HasEachMessageOnceWithItsNamesAndSession) {
+  StoreReader reader;
+  ASSERT_EQ(reader.open(directory_.path()), StoreReader::Outcome::kDone);
+  std::vector<StoredMessage> messages;
+  EXPECT_TRUE(reader.readMessages({}, [&](const StoredMessage& message) { messages.push_back(message); }));
+  ASSERT_EQ(messages.size(), 5U);
+  EXPECT_EQ(messages[0].name, "tonewerk.Start");
+  EXPECT_EQ(messages[0].secondName, "service.Start");
+  EXPECT_EQ(messages[0].session, 1);
+  EXPECT_EQ(messages[0].application, "Phone");
+  EXPECT_FALSE(messages[0].isDerived);
+  EXPECT_EQ(messages[2].secondName, std::nullopt);
+  EXPECT_EQ(messages[2].session, std::nullopt);
+  EXPECT_EQ(messages[3].recordedAt, 14.0);
+  EXPECT_TRUE(messages[3].isDerived);
+}
+
+TEST_F(StoreReaderSessionsTest, ChoosesMessagesByTheirSessions) {
+  EXPECT_EQ(idsOf({}), "1 2 3 4 5 ");
+  EXPECT_EQ(idsOf({.session = 2}), "2 4 ");
+  EXPECT_EQ(idsOf({.application = "Mel*"}), "2 4 ");
+  EXPECT_EQ(idsOf({.service = "tele*"}), "1 ");
+  EXPECT_EQ(idsOf({.service = "unknown"}), "5 ");
+  EXPECT_EQ(idsOf({.device = "Sp*"}), "2 4 ");
+  EXPECT_EQ(idsOf({.application = "Phone", .device = "Sp*"}), "");
+  EXPECT_EQ(idsOf({.name = "service.*"}), "1 2 5 ");
+  EXPECT_EQ(idsOf({.name = "*.Start", .limit = 2}), "2 5 ");
+  EXPECT_EQ(idsOf({.afterId = 3}), "4 5 ");
+  EXPECT_EQ(idsOf({.since = 12.0, .until = 14.0}), "2 3 4 ");
+}
+
+TEST_F(StoreReaderSessionsTest, ChoosesEventsLikewise) {
+  StoreReader reader;
+  ASSERT_EQ(reader.open(directory_.path()), StoreReader::Outcome::kDone);
+  std::vector<std::string> names;
+  EXPECT_TRUE(reader.readEvents({.application = "Melody"},
+                                [&](const StoredEvent& event) { names.push_back(event.name); }));
+  EXPECT_THAT(names, ElementsAre("tonewerk.Start", "service.Start", "tonewerk.Summary"));
+}
+
+// Its rows do not have the column.
+TEST_F(StoreReaderSessionsTest, ReadsTheMessagesOfAnEarlierVersionWithoutTheirSessions) {
+  {
+    SqliteDatabase database;
+    ASSERT_TRUE(database.open(storeFileIn(directory_.path()).path, SqliteDatabase::Mode::kReadWrite,
+                              std::chrono::seconds(5)));
+    ASSERT_TRUE(
+        database.run("DROP VIEW event; DROP VIEW session; DROP TABLE session_row; PRAGMA user_version = 2"));
+  }
+  EXPECT_EQ(idsOf({.limit = 2}), "4 5 ");
+  StoreReader reader;
+  ASSERT_EQ(reader.open(directory_.path()), StoreReader::Outcome::kDone);
+  EXPECT_FALSE(reader.readMessages({.application = "Melody"}, [](const StoredMessage&) {}));
+  EXPECT_THAT(reader.problem(), HasSubstr("an earlier version made it"));
 }
 
 }  // namespace
