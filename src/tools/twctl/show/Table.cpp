@@ -104,7 +104,11 @@ class Layout {
 
 Table::Cell::Cell(const Value& value) : text(value.text()), json(jsonOf(value)) {}
 
-Table::Cell Table::Cell::time(double seconds) { return {localTime(seconds), jsonOf(Value(seconds))}; }
+Table::Cell Table::Cell::time(double seconds) {
+  Cell cell(localTime(seconds), jsonOf(Value(seconds)));
+  cell.isWhole = true;
+  return cell;
+}
 
 Table::Cell Table::Cell::in(Style other) const {
   Cell cell = *this;
@@ -125,6 +129,7 @@ Table::Table(std::ostream& out, bool asJson, std::vector<std::string> columns)
     widths_.push_back(textWidth(column));
   }
   isDropped_.resize(columns_.size());
+  isWhole_.resize(columns_.size());
 }
 
 void Table::dropWhenNarrow(const std::vector<std::string>& columns) {
@@ -150,6 +155,7 @@ void Table::add(std::vector<Cell> cells) {
     row.push_back({printable(std::move(cells[at].text)), cells[at].style});
     widths_[at] = std::max(widths_[at], textWidth(row.back().text));
     rowBytes_ += row.back().text.size();
+    if (cells[at].isWhole) isWhole_[at] = true;
   }
   rows_.push_back(std::move(row));
   if (rows_.size() >= kPortion || rowBytes_ >= kPortionBytes) print();
@@ -196,7 +202,9 @@ std::optional<std::vector<std::size_t>> Table::fittingWidths() const {
 
 std::vector<std::size_t> Table::limited(std::size_t limit) const {
   std::vector<std::size_t> widths = widths_;
-  for (std::size_t& width : widths) width = std::min(width, limit);
+  for (std::size_t at = 0; at < widths.size(); ++at) {
+    if (!isWhole_[at]) widths[at] = std::min(widths[at], limit);
+  }
   return widths;
 }
 

@@ -39,8 +39,10 @@ class Table {
     std::string text;             // for people
     std::string json;             // for programs, a JSON value
     Style style = Style::kPlain;  // of the text, where there are colours
+    bool isWhole = false;         // the cells of its column are not cut
     Cell(const Value& value);
-    // Makes a cell of seconds since 1970: the local time for people (LocalTime.h), the number for programs.
+    // Makes a cell of seconds since 1970: the local time for people (LocalTime.h), which is not cut, and the
+    // number for programs.
     static Cell time(double seconds);
     Cell(std::string shown, std::string written) : text(std::move(shown)), json(std::move(written)) {}
     // The same cell in another style.
@@ -84,6 +86,7 @@ class Table {
   std::optional<std::size_t> width_;
   std::vector<std::size_t> toDrop_;  // places of columns, the first one to drop first
   std::vector<bool> isDropped_;      // by column
+  std::vector<bool> isWhole_;        // by column
   bool hasColour_ = false;
   bool headPrinted_ = false;
   bool inBlocks_ = false;

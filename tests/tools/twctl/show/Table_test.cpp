@@ -6,6 +6,7 @@
 #include <string>
 
 #include "platform/linux/json/NlohmannJsonService.h"
+#include "support/ScopedTimeZone.h"
 #include "support/ScopedVariable.h"
 #include "tools/twctl/TestTerminal.h"
 #include "tools/twctl/Tool.h"
@@ -83,6 +84,17 @@ TEST(TableTest, LeavesOutColumnsBeforeItCuts) {
   EXPECT_EQ(tableOf(20),
             "id  application\n"
             "5   com.example.pla\u2026\n");
+}
+
+TEST(TableTest, CutsOtherColumnsThanTimes) {
+  const ScopedTimeZone zone("CET-1");
+  std::ostringstream out;
+  {
+    Table table(out, false, {"time", "payload"});
+    table.fit(32);
+    table.add({Table::Cell::time(1'763'633'880.0), Value("{\"key\":\"value\"}")});
+  }
+  EXPECT_EQ(out.str(), "time                 payload\n2025-11-20 11:18:00  {\"key\":\"va\u2026\n");
 }
 
 TEST(TableTest, DoesNotCutWhatFits) {
