@@ -357,7 +357,7 @@ TEST_F(TwctlTest, EventsAreFilteredAndParsed) {
   EXPECT_EQ(run({"events", "--json", "--until", "2020-01-01T00:00:00Z"}), kDone);
   EXPECT_EQ(output, "");
   EXPECT_EQ(run({"events", "--since", "10m", "--name", "com.orvane.longformaudio.Playback.Start"}), kDone);
-  EXPECT_THAT(output, AllOf(StartsWith("id "), HasSubstr("com.orvane.longformaudio.Playback.Start")));
+  EXPECT_THAT(output, AllOf(StartsWith("time "), HasSubstr("  Playback.Start  ")));
 
   client.disconnect();
   ASSERT_EQ(daemon.stop(), 0);

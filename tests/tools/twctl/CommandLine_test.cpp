@@ -1,4 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
+#include <algorithm>
 #include <filesystem>
 #include <fstream>
 #include <gmock/gmock.h>
@@ -446,8 +447,8 @@ TEST_F(EventsCommandTest, ShowsEventsToPeople) {
   store();
   EXPECT_EQ(run({"events", "--name", "*.b"}), kDone);
   EXPECT_EQ(output(),
-            "id  time                      name          payload\n"
-            "4   2025-11-20 10:18:10.500Z  com.orvane.b  {\"n\":2}\n");
+            "time                      session  application  event         what it says\n"
+            "2025-11-20 10:18:10.500Z  -        -            com.orvane.b  n=2\n");
 }
 
 TEST_F(EventsCommandTest, GivesEventsToPrograms) {
@@ -458,6 +459,72 @@ TEST_F(EventsCommandTest, GivesEventsToPrograms) {
             "{\"id\":6,\"recorded_at\":1763633900.0,\"name\":\"com.orvane.a\",\"payload\":{\"n\":3}}\n");
 }
 
+TEST_F(EventsCommandTest, ShowsPeopleTheNewestTenAtFirst) {
+  {
+    DaemonsStore daemons(directory_.path("state"), json_);
+    for (int second = 1; second <= 12; ++second)
+      daemons.store.recordEvent(1'763'633'880.0 + second, "com.orvane.a", {{"n", second}});
+  }
+  const auto shown = [&](std::vector<std::string> arguments) {
+    arguments.insert(arguments.begin(), "events");
+    EXPECT_EQ(run(arguments), kDone) << errors();
+    const std::string text = output();
+    const auto lines = std::count(text.begin(), text.end(), '\n') - (text.starts_with("time") ? 1 : 0);
+    return std::to_string(lines) + (text.find("n=12") == std::string::npos ? "" : " with the newest");
+  };
+  EXPECT_EQ(shown({}), "10 with the newest");
+  EXPECT_EQ(shown({"-n", "2"}), "2 with the newest");
+  EXPECT_EQ(shown({"-n", "all"}), "12 with the newest");
+  EXPECT_EQ(shown({"--since", "2025-11-20"}), "12 with the newest");
+  EXPECT_EQ(shown({"--until", "2025-11-20 10:18:03"}), "3");
+  EXPECT_EQ(shown({"--json"}), "12");
+}
+
+TEST_F(EventsCommandTest, ShowsEverythingOfAMessageWhenAsked) {
+  {
+    DaemonsStore daemons(directory_.path("state"), json_);
+    daemons.store.recordEvent(1'763'633'880.0, "com.orvane.tonewerk.Volume.Summary",
+                              {{"audiotag", "VolumeSummary"}, {"play_seconds", 10.1000003}});
+  }
+  EXPECT_EQ(run({"events", "--long"}), kDone);
+  EXPECT_EQ(output(),
+            "event 1\n"
+            "  time        2025-11-20 10:18:00Z\n"
+            "  name        com.orvane.tonewerk.Volume.Summary\n"
+            "    audiotag=VolumeSummary\n"
+            "    play_seconds=10.1000003\n"
+            "\n");
+  EXPECT_EQ(run({"events"}), kDone);
+  EXPECT_THAT(output(), HasSubstr("  Volume.Summary  play_seconds=10.1\n"));
+}
+
+TEST_F(EventsCommandTest, KnowsTheNearestServiceAndRefusesWhatIsNone) {
+  store();
+  EXPECT_EQ(run({"events", "--service", "telefony"}), kWrongUsage);
+  EXPECT_EQ(errors(), "twctl: --service: there is no service 'telefony'; did you mean 'telephony'?\n");
+  EXPECT_EQ(run({"events", "--service", "tele*"}), kDone);
+  EXPECT_EQ(run({"events", "--service", "unknown"}), kDone);
+  EXPECT_EQ(run({"sessions", "--service", "alrms"}), kWrongUsage);
+  EXPECT_THAT(errors(), HasSubstr("did you mean 'alarms'?"));
+}
+
+TEST_F(EventsCommandTest, OtherListingsSayWhatTheyCannotChooseBy) {
+  store();
+  for (const std::vector<std::string>& wrong :
+       std::vector<std::vector<std::string>>{{"power", "--session", "1"},
+                                             {"power", "--service", "haptics"},
+                                             {"power", "--device", "Speaker"},
+                                             {"metrics", "--app", "a"},
+                                             {"metrics", "--session", "1"},
+                                             {"rtc", "--session", "1"},
+                                             {"rtc", "--device", "Speaker"}}) {
+    EXPECT_EQ(run(wrong), kWrongUsage) << testing::PrintToString(wrong);
+    EXPECT_THAT(errors(), HasSubstr(wrong[1] + ": the store does not know of ")) << errors();
+  }
+  EXPECT_EQ(run({"power", "--app", "a"}), kDone) << errors();
+  EXPECT_EQ(run({"rtc", "--app", "a", "--service", "telephony"}), kDone) << errors();
+}
+
 TEST_F(EventsCommandTest, PrintsNothingThatControlsATerminal) {
   {
     DaemonsStore daemons(directory_.path("state"), json_);
@@ -465,7 +532,9 @@ TEST_F(EventsCommandTest, PrintsNothingThatControlsATerminal) {
     store.recordEvent(1'763'633'880.0, "com.orvane.a\x1b\n", {{"k\x7F", "v\xC2\x9B\xE2\x80\xAE"}});
   }
   EXPECT_EQ(run({"events"}), kDone);
-  EXPECT_THAT(output(), HasSubstr(R"(  com.orvane.a\u001b\n  {"k\u007f":"v\u009b\u202e"})"));
+  EXPECT_THAT(output(), HasSubstr(R"(  com.orvane.a\u001b\n  k\u007f=v\u009b\u202e)"));
+  EXPECT_EQ(run({"events", "--long"}), kDone);
+  EXPECT_THAT(output(), AllOf(HasSubstr(R"(com.orvane.a\u001b\n)"), HasSubstr(R"(k\u007f=v\u009b\u202e)")));
   EXPECT_EQ(run({"events", "--json"}), kDone);
   EXPECT_THAT(output(), HasSubstr(R"("name":"com.orvane.a\u001b\n","payload":{"k\u007f":"v\u009b\u202e"}})"));
 }
@@ -615,6 +684,14 @@ TEST_F(PowerCommandTest, GivesTotalsAloneToPrograms) {
             "{\"ApplicationName\":\"chat\",\"EngineOnDuration\":7.0,\"events\":1}\n"
             "{\"ApplicationName\":\"game\",\"EngineOnDuration\":3.5,\"events\":2}\n"
             "{\"ApplicationName\":null,\"EngineOnDuration\":0.25,\"events\":1}\n");
+}
+
+TEST_F(PowerCommandTest, ChoosesByTheApplication) {
+  store();
+  EXPECT_EQ(run({"power", "--totals", "--app", "g*"}), kDone);
+  EXPECT_EQ(output(),
+            "ApplicationName  EngineOnDuration  events\n"
+            "game             3.5               2\n");
 }
 
 TEST_F(PowerCommandTest, TotalsKeepToTheFilter) {

@@ -4,6 +4,7 @@
 #include <CLI/CLI.hpp>
 #include <iomanip>
 #include <memory>
+#include <optional>
 #include <ostream>
 #include <string>
 #include <string_view>
@@ -11,7 +12,11 @@
 
 #include "platform/linux/diagnostics/DiagnosticsDirectory.h"
 #include "tools/twctl/commands/Commands.h"
+#include "tools/twctl/input/EventFilterOptions.h"
+#include "tools/twctl/input/TimeArgument.h"
+#include "tools/twctl/input/TimeRangeOptions.h"
 #include "tools/twctl/show/DiagnosticSummary.h"
+#include "tools/twctl/show/LocalTime.h"
 #include "tools/twctl/show/PagedOutput.h"
 #include "tools/twctl/show/Table.h"
 #include "values/PrintableText.h"
@@ -29,6 +34,8 @@ struct DiagnosticsCommand {
   std::vector<std::string> names = {};
   bool latest = false;
   bool all = false;
+  TimeRangeOptions range = {};
+  std::optional<std::string> limit = std::nullopt;
 };
 
 using Entry = DiagnosticsDirectory::Entry;
@@ -43,21 +50,56 @@ bool canRead(Tool& tool, const DiagnosticsDirectory& directory, DiagnosticKind k
   return false;
 }
 
+// An item of the list; none of a summary where the request cannot be read.
+struct Shown {
+  Entry entry;
+  std::optional<DiagnosticSummary> summary;
+};
+
+// Those of the time and the number that are asked for, oldest first. A time leaves out items whose own time is
+// not known.
+std::vector<Shown> chosen(const DiagnosticsDirectory& directory, const DiagnosticsCommand& command,
+                          const TimeRangeOptions::Range& range) {
+  std::vector<Shown> all;
+  for (Entry& entry : directory.list(command.kind)) {
+    const auto text = directory.readFile(command.kind, entry.name, kRequestFile);
+    auto summary = DiagnosticSummary::read(command.kind, text.value_or(""));
+    const auto when = summary ? timeOfArgument(summary->when, 0.0) : std::nullopt;
+    const bool isOut =
+        (range.since && (!when || *when < *range.since)) || (range.until && (!when || *when > *range.until));
+    if (!isOut) all.push_back({std::move(entry), std::move(summary)});
+  }
+  const auto limit = EventFilterOptions::limitOf(command.limit);
+  if (limit && static_cast<std::size_t>(*limit) < all.size())
+    all.erase(all.begin(), all.end() - static_cast<std::ptrdiff_t>(*limit));
+  return all;
+}
+
+// For people in the local zone, as all times; for programs as it is in the file.
+Table::Cell whenCell(const DiagnosticSummary& summary) {
+  const auto when = timeOfArgument(summary.when, 0.0);
+  if (!when) return Value(summary.when);
+  Table::Cell cell = Table::Cell::time(*when);
+  cell.json = Table::Cell(Value(summary.when)).json;
+  return cell;
+}
+
 void list(Tool& tool, const DiagnosticsCommand& command) {
+  const std::optional<TimeRangeOptions::Range> range = command.range.range(tool);
+  if (!range) return;
   const PagedOutput pages(tool);
   const DiagnosticsDirectory directory = directoryOf(tool);
   if (!canRead(tool, directory, command.kind)) return;
   Table table(tool, {"id", "when", "what", "process", "bytes", "problems"});
   table.dropWhenNarrow({"problems", "bytes", "process"});
-  for (const Entry& entry : directory.list(command.kind)) {
-    const auto text = directory.readFile(command.kind, entry.name, kRequestFile);
-    const auto summary = DiagnosticSummary::read(command.kind, text.value_or(""));
+  for (const Shown& shown : chosen(directory, command, *range)) {
+    const auto& [entry, summary] = shown;
     if (!summary) {
       table.add({Value(entry.name), Value(""), Value("(request.json cannot be read)"), Value(""),
                  Value(entry.bytes), Value(0)});
       continue;
     }
-    table.add({Value(entry.name), Value(summary->when), Value(summary->what), Value(summary->process),
+    table.add({Value(entry.name), whenCell(*summary), Value(summary->what), Value(summary->process),
                Value(entry.bytes), Value(summary->problems.size())});
   }
 }
@@ -75,7 +117,8 @@ std::string beginningOf(const std::string& text) {
 
 void printSummary(std::ostream& out, const DiagnosticSummary& summary) {
   printField(out, "what", summary.what);
-  printField(out, "when", summary.when);
+  const auto when = timeOfArgument(summary.when, 0.0);
+  printField(out, "when", when ? localTime(*when) : summary.when);
   printField(out, "why", summary.why);
   printField(out, "process", summary.process);
   printField(out, "component", summary.component);
@@ -172,11 +215,15 @@ void addDiagnosticsCommand(CLI::App& app, Tool& tool, const std::string& name, c
   const auto options = std::make_shared<DiagnosticsCommand>(std::move(initial));
   CLI::App& command = addCommand(app, tool, name, description);
   command.require_subcommand(0, 1);
+  options->range.addTo(command, "those");
+  EventFilterOptions::addLimit(command, options->limit);
   command.callback([&tool, &command, options] {
     if (command.get_subcommands().empty()) list(tool, *options);
   });
 
   CLI::App& listing = addCommand(command, tool, "list", "All of them, oldest first; also without a word");
+  options->range.addTo(listing, "those");
+  EventFilterOptions::addLimit(listing, options->limit);
   listing.callback([&tool, options] { list(tool, *options); });
 
   CLI::App& showing = addCommand(command, tool, "show", "What one is about and what was collected");

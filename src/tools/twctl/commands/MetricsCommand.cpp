@@ -67,7 +67,7 @@ void addMetricsCommand(CLI::App& app, Tool& tool) {
   CLI::App& command =
       addCommand(app, tool, "metrics", "The metric records in the store, decoded, oldest first");
   const auto options = std::make_shared<EventFilterOptions>();
-  options->addWithoutNameTo(command);
+  options->addTo(command, "metric records", {});
   command.callback([&tool, options] { metrics(tool, *options); });
 }
 

@@ -74,7 +74,8 @@ void addPowerCommand(CLI::App& app, Tool& tool) {
                                  "The power events in the store, oldest first, and for how long each "
                                  "application had the haptics engine on");
   const auto options = std::make_shared<PowerOptions>();
-  options->filter.addTo(command);
+  using Choice = EventFilterOptions::Choice;
+  options->filter.addTo(command, "power events", {Choice::kName, Choice::kApplication});
   command.add_flag("--totals", options->totalsOnly, "Only for how long the engine was on, by application");
   command.callback([&tool, options] { power(tool, *options); });
 }

@@ -64,7 +64,9 @@ void addRtcCommand(CLI::App& app, Tool& tool) {
       addCommand(app, tool, "rtc",
                  "The real-time-communication sessions in the store, and their messages, oldest first");
   const auto options = std::make_shared<EventFilterOptions>();
-  options->addTo(command);
+  using Choice = EventFilterOptions::Choice;
+  options->addTo(command, "real-time-communication reports",
+                 {Choice::kName, Choice::kApplication, Choice::kService});
   command.callback([&tool, options] { rtc(tool, *options); });
 }
 

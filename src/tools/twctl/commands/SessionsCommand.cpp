@@ -7,6 +7,7 @@
 
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/commands/StoreSql.h"
+#include "tools/twctl/input/EventFilterOptions.h"
 #include "tools/twctl/input/TimeRangeOptions.h"
 #include "tools/twctl/input/ValueArguments.h"
 #include "tools/twctl/sessions/SessionsTable.h"
@@ -20,6 +21,7 @@ namespace {
 struct SessionsOptions {
   SessionFilter filter;
   TimeRangeOptions range;
+  std::optional<std::string> limit;
 };
 
 void sessions(Tool& tool, const SessionsOptions& options) {
@@ -31,6 +33,7 @@ void sessions(Tool& tool, const SessionsOptions& options) {
   SessionFilter filter = options.filter;
   filter.since = range->since;
   filter.until = range->until;
+  filter.limit = EventFilterOptions::limitOf(options.limit);
   const double now =
       std::chrono::duration<double>(std::chrono::system_clock::now().time_since_epoch()).count();
   SessionsTable table(tool.out, tool.asJson, now, widthOf(tool));
@@ -49,14 +52,16 @@ void addSessionsCommand(CLI::App& app, Tool& tool) {
       "\n`twctl session ID` tells what happened in one. The store is read whether a daemon runs or not.");
   const auto options = std::make_shared<SessionsOptions>();
   options->range.addTo(command, "sessions that ran");
-  command.add_option("-n,--limit", options->filter.limit, "Only the newest so many")->check(problemWithCount);
+  EventFilterOptions::addLimit(command, options->limit);
   command.add_option("--app", options->filter.application, "Only those of such applications")
       ->type_name("GLOB");
   command
       .add_option("--device", options->filter.device, "Only those that played or recorded on such devices")
       ->type_name("GLOB");
-  command.add_option("--service", options->filter.service, "Only those for such services, as telephony")
-      ->type_name("GLOB");
+  EventFilterOptions::addService(command, options->filter.service, "Only those");
+  command.add_option("--session", options->filter.session, "Only the one of this id")
+      ->type_name("ID")
+      ->check(problemWithCount);
   command.callback([&tool, options] { sessions(tool, *options); });
 }
 

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <CLI/CLI.hpp>
 #include <cstdint>
+#include <fnmatch.h>
 #include <limits>
 #include <memory>
 #include <optional>
@@ -8,11 +9,13 @@
 #include <string>
 #include <vector>
 
+#include "protocol/EventTexts.h"
 #include "protocol/Requests.h"
 #include "protocol/WatchKeys.h"
 #include "tools/twctl/DaemonCalls.h"
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/commands/LiveEvents.h"
+#include "tools/twctl/input/EventFilterOptions.h"
 #include "tools/twctl/input/ValueArguments.h"
 #include "tools/twctl/show/MessagePrinter.h"
 
@@ -23,8 +26,17 @@ struct TailOptions {
   std::vector<ReporterID> reporterIDs;
   std::optional<std::string> category;
   std::optional<std::string> type;
+  std::optional<std::string> service;
   std::int64_t count = std::numeric_limits<std::int64_t>::max();
 };
+
+// Whether the message is of a service that the options choose, which the daemon does not do.
+bool isWanted(const TailOptions& options, const ValueMap& message) {
+  if (!options.service) return true;
+  const std::string name = TWReportingUtilityGenerateServiceNameFromServiceType(
+      static_cast<AudioServiceType>(message.integer(kWatchKeyServiceType)));
+  return fnmatch(options.service->c_str(), name.c_str(), 0) == 0;
+}
 
 Argument listOf(const std::vector<ReporterID>& numbers) {
   if (numbers.empty()) return std::nullopt;
@@ -50,7 +62,7 @@ std::optional<Arguments> filterOf(const TailOptions& options, std::string& probl
 }
 
 // Prints at most `left` messages of an answer of watch.nextMessages, and subtracts their number from `left`.
-void print(const Tool& tool, const ValueMap& answer, std::int64_t& left) {
+void print(const Tool& tool, const TailOptions& options, const ValueMap& answer, std::int64_t& left) {
   const MessagePrinter printer(tool);
   const std::int64_t missed = answer.integer(kWatchKeyMissed);
   if (missed > 0) printer.printMissed(static_cast<std::uint64_t>(missed));
@@ -58,7 +70,7 @@ void print(const Tool& tool, const ValueMap& answer, std::int64_t& left) {
   if (list != nullptr && list->asArray() != nullptr) {
     for (const Value& message : *list->asArray()) {
       if (left == 0) break;
-      if (message.asMap() == nullptr) continue;
+      if (message.asMap() == nullptr || !isWanted(options, *message.asMap())) continue;
       printer.print(*message.asMap());
       --left;
     }
@@ -88,7 +100,7 @@ void tail(Tool& tool, const TailOptions& options) {
       daemon.await(requests::kWatchOpenMessages.name, *filter, waitReadable, failure);
   for (std::int64_t left = options.count; answer && left > 0 && tool.out;) {
     answer = daemon.await(requests::kWatchNextMessages.name, {}, waitReadable, failure);
-    if (answer && answer->asMap() != nullptr) print(tool, *answer->asMap(), left);
+    if (answer && answer->asMap() != nullptr) print(tool, options, *answer->asMap(), left);
   }
   if (failure) tool.status = tool.fail(failure->status, failure->problem);
 }
@@ -105,7 +117,8 @@ void addTailCommand(CLI::App& app, Tool& tool) {
       ->take_all();
   command.add_option("--category", options->category, "Only of it: a name, as Playback, or a number");
   command.add_option("--type", options->type, "Only of it: a name, as Start, or a number");
-  command.add_option("--count", options->count, "Only so many")->check(problemWithCount);
+  EventFilterOptions::addService(command, options->service, "Only of sessions");
+  command.add_option("-n,--count", options->count, "Only so many")->check(problemWithCount);
   command.callback([&tool, options] { tail(tool, *options); });
 }
 

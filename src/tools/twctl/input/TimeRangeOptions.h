@@ -30,6 +30,9 @@ class TimeRangeOptions {
   // None when an option is wrong, or the range ends before it begins; the problem is then printed.
   [[nodiscard]] std::optional<Range> range(Tool& tool) const;
 
+  // Whether there is one of the options.
+  bool isGiven() const { return since_ || until_; }
+
   // How people write a time, for a footer.
   static constexpr const char* kForms =
       "A time is as 2026-11-20, \"2026-11-20 10:18\", 2026-11-20T10:18:00Z, today or yesterday,\n"

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "tools/twctl/input/ValueArguments.h"
 
+#include <algorithm>
 #include <charconv>
 #include <cmath>
 #include <system_error>
@@ -143,6 +144,18 @@ std::string unknownCategory(std::string_view text) {
 
 std::string unknownType(std::string_view text) {
   return "there is no type '" + std::string(text) + "'; " + hintFor(text, typeNames());
+}
+
+std::string problemWithService(const std::string& pattern) {
+  if (pattern.find_first_of("*?[") != std::string::npos) return "";
+  std::vector<std::string> names;
+  const std::string unknown = TWReportingUtilityGenerateServiceNameFromServiceType(kServiceUnknown);
+  for (AudioServiceType type = 0; type < kNamesEnd; ++type) {
+    std::string name = TWReportingUtilityGenerateServiceNameFromServiceType(type);
+    if (name != unknown) names.push_back(std::move(name));
+  }
+  if (pattern == unknown || std::find(names.begin(), names.end(), pattern) != names.end()) return "";
+  return "there is no service '" + pattern + "'; " + hintFor(pattern, names);
 }
 
 std::string problemWithReporterID(const std::string& text) {

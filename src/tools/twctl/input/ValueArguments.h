@@ -34,6 +34,10 @@ std::vector<std::string> typeNames();
 std::string unknownCategory(std::string_view text);
 std::string unknownType(std::string_view text);
 
+// The problem with a pattern for the names of services; empty when it has *, ? or [, or is the name of a
+// service.
+[[nodiscard]] std::string problemWithService(const std::string& pattern);
+
 // The problem with a session's identifier; empty when it is a decimal number of 64 bits with a sign. For
 // options that are read into a ReporterID, because the parser itself would turn a number that is too large
 // into the largest one.

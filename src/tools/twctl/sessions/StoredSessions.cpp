@@ -35,11 +35,12 @@ std::string conditionOf(const SessionFilter& filter) {
                     orNull(filter.until) + " IS NULL OR started_at <= " + orNull(filter.until) + ")";
   if (filter.application) sql += " AND application GLOB ?1";
   if (filter.service) sql += " AND coalesce(service, 'unknown') GLOB ?2";
+  if (filter.session) sql += " AND id = " + std::to_string(*filter.session);
   if (filter.device) {
     sql +=
-        " AND id IN (SELECT session FROM volume_stretch WHERE device GLOB ?3 UNION ALL SELECT session FROM "
-        "input_stretch WHERE device GLOB ?3 UNION ALL SELECT session FROM gather_stretch WHERE device GLOB "
-        "?3)";
+        " AND id IN (SELECT session FROM volume_stretch WHERE started_at IS NOT NULL AND device GLOB ?3"
+        " UNION ALL SELECT session FROM input_stretch WHERE started_at IS NOT NULL AND device GLOB ?3"
+        " UNION ALL SELECT session FROM gather_stretch WHERE started_at IS NOT NULL AND device GLOB ?3)";
   }
   return sql;
 }

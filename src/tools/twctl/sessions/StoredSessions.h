@@ -33,8 +33,9 @@ struct SessionFilter {
   std::optional<double> until;  // that ran then or earlier
   std::optional<std::string> application;
   std::optional<std::string> service;
-  std::optional<std::string> device;  // that played or recorded on such devices
-  std::optional<std::int64_t> limit;  // the newest so many
+  std::optional<std::string> device;    // that played or recorded on such devices
+  std::optional<std::int64_t> session;  // its id
+  std::optional<std::int64_t> limit;    // the newest so many
 };
 
 // Calls `take` for each session of the filter, in the order in which they began. False when the store cannot

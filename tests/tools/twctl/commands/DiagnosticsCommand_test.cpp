@@ -10,6 +10,7 @@
 
 #include "platform/linux/diagnostics/DiagnosticsDirectory.h"
 #include "platform/linux/json/NlohmannJsonService.h"
+#include "support/ScopedTimeZone.h"
 #include "support/TemporaryDirectory.h"
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/show/DiagnosticSummary.h"
@@ -32,6 +33,7 @@ constexpr const char* kCaptureRequest =
 // Runs twctl with its own state directory.
 class DiagnosticsCommandTest : public testing::Test {
  protected:
+  const ScopedTimeZone zone{"UTC0"};
   DiagnosticsCommandTest() { setenv("STATE_DIRECTORY", directory.path("state").c_str(), 1); }
   void TearDown() override { unsetenv("STATE_DIRECTORY"); }
 
@@ -65,6 +67,27 @@ TEST_F(DiagnosticsCommandTest, ListsNothingWhereNothingIs) {
   }
 }
 
+TEST_F(DiagnosticsCommandTest, ListsThoseOfATimeAndTheNewestSoMany) {
+  put(DiagnosticKind::kCapture, "known", kCaptureRequest, 20);
+  put(DiagnosticKind::kCapture, "unknown", "{", 10);
+  const auto idsOf = [&](std::vector<std::string> arguments) {
+    arguments.insert(arguments.begin(), {"captures", "--json"});
+    EXPECT_EQ(run(arguments), kDone) << err.str();
+    std::string ids;
+    for (const char* id : {"\"known\"", "\"unknown\""}) {
+      if (out.str().find(id) != std::string::npos) ids += id;
+    }
+    return ids;
+  };
+  EXPECT_EQ(idsOf({}), "\"known\"\"unknown\"");
+  EXPECT_EQ(idsOf({"-n", "1"}), "\"unknown\"");
+  EXPECT_EQ(idsOf({"-n", "all"}), "\"known\"\"unknown\"");
+  EXPECT_EQ(idsOf({"--since", "2026-11-20"}), "\"known\"");
+  EXPECT_EQ(idsOf({"--since", "2026-11-21"}), "");
+  EXPECT_EQ(idsOf({"list", "--until", "2026-11-21"}), "\"known\"");
+  EXPECT_EQ(run({"captures", "--since", "then"}), kWrongUsage);
+}
+
 TEST_F(DiagnosticsCommandTest, ListsItemsOfItsKindOldestFirst) {
   put(DiagnosticKind::kCapture, "new", kCaptureRequest);
   put(DiagnosticKind::kCapture, "old", "{", 100);
@@ -73,7 +96,7 @@ TEST_F(DiagnosticsCommandTest, ListsItemsOfItsKindOldestFirst) {
   EXPECT_THAT(out.str(),
               ContainsRegex("id +when +what +process +bytes +problems *\n"
                             "old +\\(request.json cannot be read\\) +12288 +0 *\n"
-                            "new +2026-11-20T10:18:00Z +alarms / Error / IssueDetector +alarmd +12288 +1"));
+                            "new +2026-11-20 10:18:00Z +alarms / Error / IssueDetector +alarmd +12288 +1"));
   EXPECT_THAT(out.str(), Not(HasSubstr("other")));
   const std::string table = out.str();
   EXPECT_EQ(run({"captures", "list"}), kDone);
@@ -99,7 +122,7 @@ TEST_F(DiagnosticsCommandTest, ShowsTheLatestCapture) {
   EXPECT_EQ(out.str(),
             "capture two\n"
             "  what      alarms / Error / IssueDetector\n"
-            "  when      2026-11-20T10:18:00Z\n"
+            "  when      2026-11-20 10:18:00Z\n"
             "  why       AudioAnalytics\n"
             "  process   alarmd\n"
             "  duration  60.0 s\n"

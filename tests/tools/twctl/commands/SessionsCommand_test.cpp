@@ -24,7 +24,7 @@ class SessionsCommandTest : public CommandLineTest {
     views.run(
         "UPDATE session SET service = 'telephony' WHERE id = 1;"
         "UPDATE session SET ended_at = NULL, ending = NULL, messages = NULL WHERE id = 3;"
-        "INSERT INTO input_stretch (session, device) VALUES (2, 'Microphone')");
+        "INSERT INTO input_stretch (session, started_at, device) VALUES (2, 1795132800, 'Microphone')");
   }
 
   // The ids of the sessions that are printed, in their order.

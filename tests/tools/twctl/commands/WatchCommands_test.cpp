@@ -154,6 +154,7 @@ TEST_F(WatchCommandsTest, BothRefuseWrongUsage) {
                                              {"tail", "more"},
                                              {"tail", "--id", "x"},
                                              {"tail", "--count", "0"},
+                                             {"tail", "--service", "telefony"},
                                              {"tail", "--category", "No"},
                                              {"tail", "--type", "No"}}) {
     EXPECT_EQ(run(wrong), kWrongUsage) << testing::PrintToString(wrong);
@@ -168,6 +169,14 @@ TEST_F(WatchCommandsTest, TailPrintsSoManyMessagesAndWhatWasMissedBeforeThem) {
   const std::string line = "2025-11-20 10:20:00.500Z  77  telephony  Playback/Start  ";
   EXPECT_EQ(out.str(), "... missed 3 messages\n" + line + "{\"number\":1}\n" + line + "{\"number\":2}\n" +
                            "... missed 3 messages\n" + line + "{\"number\":1}\n");
+}
+
+TEST_F(WatchCommandsTest, TailShowsTheServicesThatAreChosen) {
+  ValueMap other = message(1);
+  other.set("serviceType", 4);
+  answerMessages(0, {other, message(2)});
+  EXPECT_EQ(run({"tail", "-n", "1", "--service", "tele*"}), kDone);
+  EXPECT_EQ(out.str(), "2025-11-20 10:20:00.500Z  77  telephony  Playback/Start  {\"number\":2}\n");
 }
 
 TEST_F(WatchCommandsTest, TailHasTheDaemonFilter) {
