@@ -7,6 +7,7 @@
 #include <cmath>
 #include <fcntl.h>
 #include <pthread.h>
+#include <sys/stat.h>
 #include <unistd.h>
 #include <utility>
 
@@ -14,7 +15,6 @@
 #include "platform/Log.h"
 #include "platform/PreferenceStore.h"
 #include "platform/accounts/Accounts.h"
-#include "platform/linux/descriptors/FileDescriptor.h"
 #include "platform/linux/files/TextFile.h"
 #include "platform/linux/store/StoreSchema.h"
 #include "values/GrowingDelay.h"
@@ -120,15 +120,30 @@ void ReportStore::readBoundsAgain() {
   queue_.wakeWriter();
 }
 
-bool ReportStore::sync() const {
-  for (const std::string& path : {database_.path() + "-wal", database_.path()}) {
-    const FileDescriptor file(::open(path.c_str(), O_RDONLY | O_CLOEXEC));
-    const bool isSynced = file ? ::fdatasync(file.get()) == 0 : errno == ENOENT;
-    if (isSynced) continue;
-    errorLog(log_, "cannot bring %s to the disk: %@", path, lastSystemError().message());
-    return false;
+int ReportStore::openedForSync() {
+  const std::string& path = database_.path();
+  struct stat named {};
+  struct stat held {};
+  if (syncFile_ && ::stat(path.c_str(), &named) == 0 && ::fstat(syncFile_.get(), &held) == 0 &&
+      named.st_dev == held.st_dev && named.st_ino == held.st_ino) {
+    return syncFile_.get();
   }
-  return true;
+  syncFile_.reset(::open(path.c_str(), O_RDONLY | O_CLOEXEC));
+  return syncFile_.get();
+}
+
+bool ReportStore::sync() {
+  const auto isDone = [this](int file, const std::string& path) {
+    const bool isSynced = file >= 0 ? ::fdatasync(file) == 0 : errno == ENOENT;
+    if (!isSynced) errorLog(log_, "cannot bring %s to the disk: %@", path, lastSystemError().message());
+    return isSynced;
+  };
+  // SQLite has no locks on the log itself.
+  const std::string logPath = database_.path() + "-wal";
+  const FileDescriptor logFile(::open(logPath.c_str(), O_RDONLY | O_CLOEXEC));
+  if (!isDone(logFile.get(), logPath)) return false;
+  const std::lock_guard lock(syncMutex_);
+  return isDone(openedForSync(), database_.path());
 }
 
 bool ReportStore::flush(std::chrono::milliseconds timeout) {

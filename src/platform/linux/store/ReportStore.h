@@ -8,6 +8,7 @@
 #include <latch>
 #include <map>
 #include <memory>
+#include <mutex>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -15,6 +16,7 @@
 
 #include "platform/Heartbeat.h"
 #include "platform/accounts/Account.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
 #include "platform/linux/store/StoreBatch.h"
 #include "platform/linux/store/StoreDatabase.h"
 #include "platform/linux/store/StoreQueue.h"
@@ -91,7 +93,7 @@ class ReportStore {
   bool hasWritten(std::uint64_t rows) const { return queue_.hasCommitted(rows); }
   // Any thread. Brings to the disk what is in the file; until then a power cut may take it away. May take
   // long. False on failure, which is logged.
-  [[nodiscard]] bool sync() const;
+  [[nodiscard]] bool sync();
 
   // Any thread. The bounds are read again and applied at once, also when there is nothing to write.
   void readBoundsAgain();
@@ -132,6 +134,8 @@ class ReportStore {
   void chargeStored();
   void readBounds();
   double bound(std::string_view key, double otherwise, std::string& wrong) const;
+  // The file at the store's path, as long as the store; none when it cannot be opened. With syncMutex_.
+  [[nodiscard]] int openedForSync();
   void logJump();
   void logFailure();
   void logSuccess(std::uint64_t dropped);
@@ -148,6 +152,12 @@ class ReportStore {
   StoreMarks heldMarks_;       // written before isRecovering_ is set
   std::latch triedToOpen_{1};  // the thread has tried to open the file
   const std::shared_ptr<Heartbeat> heartbeat_ = std::make_shared<Heartbeat>();
+
+  // Of the file, for sync(), which opens it once. Who closes any descriptor of a file takes this process's
+  // locks off it, so that one outlives SQLite's own: without its lock another program that closes the file
+  // last would remove the write-ahead log, with all that the store writes there from then on.
+  std::mutex syncMutex_;
+  FileDescriptor syncFile_;  // guarded by syncMutex_
 
   // Used by the thread alone.
   StoreDatabase database_;

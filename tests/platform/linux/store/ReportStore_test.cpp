@@ -4,6 +4,7 @@
 #include <atomic>
 #include <chrono>
 #include <cmath>
+#include <fcntl.h>
 #include <filesystem>
 #include <fstream>
 #include <functional>
@@ -23,6 +24,7 @@
 #include "platform/Log.h"
 #include "platform/accounts/Accounts.h"
 #include "platform/accounts/WorkingFor.h"
+#include "platform/linux/descriptors/FileDescriptor.h"
 #include "platform/linux/store/FullDisk.h"
 #include "platform/linux/store/StoreDatabase.h"
 #include "platform/linux/store/StoreSchema.h"
@@ -118,6 +120,7 @@ class ReportStoreTest : public testing::Test {
   MemoryPreferenceStore preferences_;
   Accounts accounts_{kOwner, clock_};
   std::function<void()> beforeWriting_;
+  std::vector<FileDescriptor> openFiles_;  // closed after the store
   std::unique_ptr<ReportStore> store_;
 };
 
@@ -245,6 +248,40 @@ TEST_F(ReportStoreTest, BringsWhatIsWrittenToTheDiskAndSaysWhenThatFails) {
   if (!isTried) GTEST_SKIP() << "system calls cannot be intercepted here";
   EXPECT_FALSE(isSynced);
   EXPECT_THAT(errors(), ElementsAre(HasSubstr("cannot bring " + file_ + "-wal to the disk: ")));
+}
+
+// A sync closed a descriptor of the file, which took SQLite's locks on it from the process. The next program
+// that wrote to the store and closed it removed the write-ahead log, and the store wrote on into nothing.
+TEST_F(ReportStoreTest, KeepsItsLocksOnTheFileWhenItSyncs) {
+  const auto isLocked = [this] {
+    const int file = ::open(file_.c_str(), O_RDWR | O_CLOEXEC);  // to close it would take the locks, too
+    struct flock lock {};
+    lock.l_type = F_WRLCK;
+    EXPECT_EQ(::fcntl(file, F_OFD_GETLK, &lock), 0);
+    openFiles_.emplace_back(file);
+    return lock.l_type != F_UNLCK;
+  };
+  open();
+  recordNumbered(1);
+  ASSERT_TRUE(flush());
+  ASSERT_TRUE(isLocked());
+  ASSERT_TRUE(store_->sync());
+  EXPECT_TRUE(isLocked());
+  ASSERT_TRUE(store_->sync());
+  EXPECT_TRUE(isLocked());
+}
+
+TEST_F(ReportStoreTest, SyncsTheFileThatTookThePlaceOfTheFirst) {
+  open();
+  recordNumbered(1);
+  ASSERT_TRUE(flush());
+  ASSERT_TRUE(store_->sync());
+  for (const char* end : {"", "-wal", "-shm"}) std::filesystem::remove(file_ + end);
+  EXPECT_TRUE(store_->sync());
+  recordNumbered(1);
+  ASSERT_TRUE(flush());
+  EXPECT_TRUE(store_->sync());
+  EXPECT_THAT(payloads(), SizeIs(1));
 }
 
 TEST_F(ReportStoreTest, SaysWhenRowsAreWritten) {
