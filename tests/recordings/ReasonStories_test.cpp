@@ -8,6 +8,7 @@
 #include <filesystem>
 #include <fstream>
 #include <gmock/gmock.h>
+#include <optional>
 #include <sstream>
 #include <string>
 #include <vector>
@@ -65,8 +66,13 @@ class Played {
     std::string problem;
     const auto records = readRecords(reader_, session.id, problem);
     ASSERT_TRUE(records) << problem;
-    const ReasonedLife* life = lifeOf(lives_, session);
-    visit(SessionStory(session, *records, life, "the journal no longer has its requests", width));
+    const auto events = readPayloads(reader_, session.id, problem);
+    ASSERT_TRUE(events) << problem;
+    std::optional<ReasonedLife> life;
+    if (const ReasonedLife* found = lifeOf(lives_, session)) life = *found;
+    if (life) nameEvents(*life, *events, json_);
+    visit(SessionStory(session, *records, life ? &*life : nullptr, "the journal no longer has its requests",
+                       width));
   }
 
  private:
@@ -161,6 +167,31 @@ TEST_F(VolumeStoryTest, SaysWhatMadeAnEvent) {
                                        "Headphones (message 7) -> Volume Summary 3 of 7, event " +
                                        std::to_string(summary) + "; made of messages 6 and 7\n"));
   EXPECT_THAT(text, testing::HasSubstr("6  +8.5 s  Volume Generic: QMSessionVolume=0.75\n"));
+}
+
+TEST_F(VolumeStoryTest, SaysOfWhatTheSummaryOfASessionIsMade) {
+  StoredEventRow event;
+  event.category = "Session_Generic";
+  event.type = "Summary";
+  event.source = "derived";
+  std::string text;
+  played_.tell(played_.sessions().front(), 200,
+               [&](const SessionStory& story) { text = story.event(event); });
+  EXPECT_THAT(text, testing::HasSubstr("The daemon makes one for each session when it stops: of all its "
+                                       "messages,"));
+}
+
+// A replay stops the session, so it makes summaries that the daemon has not made.
+TEST_F(VolumeStoryTest, TellsNothingOfASessionThatRunsAsIfItHadStopped) {
+  StoredSession session = played_.sessions().front();
+  session.endedAt.reset();
+  ReasonedLife life = played_.lives().front();
+  nameEvents(life, {}, NlohmannJsonService());
+  const SessionRecords records;
+  const std::string text = SessionStory(session, records, &life, "", 200).whole();
+  EXPECT_THAT(text, testing::Not(testing::HasSubstr("Session_Generic")));
+  EXPECT_THAT(text, testing::Not(testing::HasSubstr("does not have")));
+  EXPECT_THAT(text, testing::HasSubstr("If it stopped now:\nVolume summaries: 7."));
 }
 
 TEST(RedundancyStoryTest, SaysWhichMessageARedundantOneRepeats) {

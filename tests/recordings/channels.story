@@ -6,15 +6,11 @@ Messages, by the seconds since it began
   none
 
 Made by the daemon
-  1  +5 s  Session_Generic Summary: total_active_time=0 active_count=0 overload_count=0
-    average_active_time=0 num_messages=0 num_unique_messages=2
-    num_redundant_messages=18446744073709551614 singleMessageSession=0
-    summaryServiceName=longformaudio thermal_state=Nominal low_power_enabled=0
-    vmInfo_phys_footprint_MiB=8 load_avg_1_min=0 load_avg_5_min=0 load_avg_15_min=0
-  2  +5 s  Chanmetering Simple: AmpDrv_Speaker_Simple_RailVolts=30
-  3  +5 s  Chanmetering Histogram:
+  1  +5 s  Session_Generic Summary, which the store does not have
+  2  +5 s  Chanmetering Simple, event 1: AmpDrv_Speaker_Simple_RailVolts=30
+  3  +5 s  Chanmetering Histogram, event 2:
     AmpDrv_Tx_Queue_Histogram_Delay=count=2,lower=0,upper=20,min=1,max=90,unit=us::0-10:4
-  4  +5 s  Chanmetering State:
+  4  +5 s  Chanmetering State, event 3:
     AmpDrv_pdm_State_Mic=name:on,transition:3,residency:300,duty_cycle:1.000000;
 
 Volume summaries: 0. A stretch of output must be longer than 0.5 s.
@@ -34,12 +30,8 @@ Messages, by the seconds since it began
   none
 
 Made by the daemon
-  1  +1 s  Session_Generic Summary: total_active_time=0 active_count=0 overload_count=0
-    average_active_time=0 num_messages=0 num_unique_messages=2
-    num_redundant_messages=18446744073709551614 singleMessageSession=0
-    summaryServiceName=longformaudio thermal_state=Nominal low_power_enabled=0
-    vmInfo_phys_footprint_MiB=8 load_avg_1_min=0 load_avg_5_min=0 load_avg_15_min=0
-  2  +1 s  Chanmetering State: AmpDrv_pdm_State_Mic=
+  1  +1 s  Session_Generic Summary, which the store does not have
+  2  +1 s  Chanmetering State, event 4: AmpDrv_pdm_State_Mic=
 
 Volume summaries: 0. A stretch of output must be longer than 0.5 s.
   none: no message said that output began or ended (session_output_running)

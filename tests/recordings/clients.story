@@ -8,7 +8,7 @@ Messages, by the seconds since it began
   3  +3 s  RouteChange Stop: of=all sessions of its user
 
 Made by the daemon
-  4  +6 s  Session_Generic Summary: total_active_time=0 active_count=0 overload_count=0
+  4  +6 s  Session_Generic Summary, event 6: total_active_time=0 active_count=0 overload_count=0
     average_active_time=0 num_messages=3 num_unique_messages=5
     num_redundant_messages=18446744073709551614 singleMessageSession=0
     summaryServiceName=longformaudio thermal_state=Nominal low_power_enabled=0
@@ -31,7 +31,7 @@ Messages, by the seconds since it began
   1  +1 s  RouteChange Generic: of=phone
 
 Made by the daemon
-  2  +7 s  Session_Generic Summary: total_active_time=0 active_count=0 overload_count=0
+  2  +7 s  Session_Generic Summary, event 7: total_active_time=0 active_count=0 overload_count=0
     average_active_time=0 num_messages=1 num_unique_messages=3
     num_redundant_messages=18446744073709551614 singleMessageSession=0 summaryServiceName=telephony
     thermal_state=Nominal low_power_enabled=0 vmInfo_phys_footprint_MiB=8 load_avg_1_min=0

@@ -7,7 +7,7 @@ Messages, by the seconds since it began
   2  +61.9 s  Generic Energybook: Haptic_Active_Hardware_Time_Seconds=3661 Active_Clients=player
 
 Made by the daemon
-  3  +78.4 s  Session_Generic Summary: total_active_time=0 active_count=0 overload_count=0
+  3  +78.4 s  Session_Generic Summary, event 10: total_active_time=0 active_count=0 overload_count=0
     average_active_time=0 num_messages=2 num_unique_messages=4
     num_redundant_messages=18446744073709551614 singleMessageSession=0 summaryServiceName=haptics
     thermal_state=Nominal low_power_enabled=0 vmInfo_phys_footprint_MiB=8 load_avg_1_min=0
@@ -32,7 +32,7 @@ Messages, by the seconds since it began
   3  +16.9 s  Error IssueDetector: issue_type=LowRMS node=speaker rms=-73.5
 
 Made by the daemon
-  4  +78.4 s  Session_Generic Summary: total_active_time=0 active_count=0 overload_count=0
+  4  +78.4 s  Session_Generic Summary, event 12: total_active_time=0 active_count=0 overload_count=0
     average_active_time=0 num_messages=3 num_unique_messages=5
     num_redundant_messages=18446744073709551614 singleMessageSession=0 summaryServiceName=alarms
     thermal_state=Nominal low_power_enabled=0 vmInfo_phys_footprint_MiB=8 load_avg_1_min=0
@@ -64,7 +64,7 @@ Messages, by the seconds since it began
   4  +17.9 s  Performance MemoryLog: reason=footprint above its limit
 
 Made by the daemon
-  5  +78.4 s  Session_Generic Summary: total_active_time=0 active_count=0 overload_count=0
+  5  +78.4 s  Session_Generic Summary, event 14: total_active_time=0 active_count=0 overload_count=0
     average_active_time=0 num_messages=4 num_unique_messages=6
     num_redundant_messages=18446744073709551614 singleMessageSession=0 summaryServiceName=telephony
     thermal_state=Nominal low_power_enabled=0 vmInfo_phys_footprint_MiB=8 load_avg_1_min=0

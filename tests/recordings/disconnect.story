@@ -7,7 +7,7 @@ Messages, by the seconds since it began
   2  +4 s  Output Stop: session_output_running=0
 
 Made by the daemon
-  4  +6 s  Session_Generic Summary: total_active_time=0 active_count=0 overload_count=0
+  4  +6 s  Session_Generic Summary, event 3: total_active_time=0 active_count=0 overload_count=0
     average_active_time=0 num_messages=3 num_unique_messages=5
     num_redundant_messages=18446744073709551614 singleMessageSession=0
     summaryServiceName=longformaudio thermal_state=Nominal low_power_enabled=0
@@ -69,7 +69,7 @@ Messages, by the seconds since it began
   1  +0 s  RouteChange Generic: route=Speaker
 
 Made by the daemon
-  2  +2 s  Session_Generic Summary: total_active_time=0 active_count=0 overload_count=0
+  2  +2 s  Session_Generic Summary, event 4: total_active_time=0 active_count=0 overload_count=0
     average_active_time=0 num_messages=1 num_unique_messages=3
     num_redundant_messages=18446744073709551614 singleMessageSession=0 summaryServiceName=unknown
     clientProcessName=player thermal_state=Nominal low_power_enabled=0 vmInfo_phys_footprint_MiB=8

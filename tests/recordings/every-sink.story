@@ -19,7 +19,7 @@ Messages, by the seconds since it began
   9  +0.9 s  Setup Stop: session_duration=30
 
 Made by the daemon
-  13  +1 s  Session_Generic Summary: total_active_time=30 active_count=1 overload_count=1
+  13  +1 s  Session_Generic Summary, event 13: total_active_time=30 active_count=1 overload_count=1
     average_active_time=30 num_messages=12 num_unique_messages=14
     num_redundant_messages=18446744073709551614 singleMessageSession=0
     summaryServiceName=longformaudio thermal_state=Nominal low_power_enabled=0

@@ -15,11 +15,7 @@ Messages, by the seconds since it began
   9  +40 s  Setup Stop: session_duration=10
 
 Made by the daemon
-  14  +41 s  Session_Generic Summary: total_active_time=10 active_count=1 overload_count=0
-    average_active_time=10 num_messages=13 num_unique_messages=15
-    num_redundant_messages=18446744073709551614 singleMessageSession=0
-    summaryServiceName=longformaudio thermal_state=Nominal low_power_enabled=0
-    vmInfo_phys_footprint_MiB=8 load_avg_1_min=0 load_avg_5_min=0 load_avg_15_min=0
+  14  +41 s  Session_Generic Summary, which the store does not have
 
 Volume summaries: 0. A stretch of output must be longer than 0.5 s.
   +1 s  output began (message 1)
@@ -47,7 +43,7 @@ Gather summaries: 4. A stretch of output must be longer than 0.5 s.
   until +25 s  output stopped (message 5) -> no summary: no message that counts says when it began
   +30 s  output began (message 6)
   +30 s to +34 s, 4 s  gather_session=0 came again (message 8) -> Gather Summary 3 of 4, event 3;
-    made of messages 6, 7 and 8
+    made of messages 6 to 8
   +34 s to +40 s, 6 s  the client said how long the session was (message 9) -> Gather Summary 4 of
     4, event 4; made of messages 8 and 9
 Input summaries: 0. A stretch of input must be longer than 0.5 s.

@@ -12,11 +12,7 @@ Messages, by the seconds since it began
   6  +6 s  Generic Generic: EngineOnTime=9
 
 Made by the daemon
-  7  +9 s  Session_Generic Summary: total_active_time=0 active_count=0 overload_count=0
-    average_active_time=0 num_messages=6 num_unique_messages=8
-    num_redundant_messages=18446744073709551614 singleMessageSession=0 summaryServiceName=haptics
-    thermal_state=Nominal low_power_enabled=0 vmInfo_phys_footprint_MiB=8 load_avg_1_min=0
-    load_avg_5_min=0 load_avg_15_min=0
+  7  +9 s  Session_Generic Summary, which the store does not have
 
 Volume summaries: 0. A stretch of output must be longer than 0.5 s.
   none: no message said that output began or ended (session_output_running)
@@ -35,11 +31,7 @@ Messages, by the seconds since it began
   1  +1 s  Generic Energybook: EngineOnTime=2.5 EngineState=EngineOn
 
 Made by the daemon
-  2  +2 s  Session_Generic Summary: total_active_time=0 active_count=0 overload_count=0
-    average_active_time=0 num_messages=1 num_unique_messages=3
-    num_redundant_messages=18446744073709551614 singleMessageSession=0 summaryServiceName=haptics
-    thermal_state=Nominal low_power_enabled=0 vmInfo_phys_footprint_MiB=8 load_avg_1_min=0
-    load_avg_5_min=0 load_avg_15_min=0
+  2  +2 s  Session_Generic Summary, which the store does not have
 
 Volume summaries: 0. A stretch of output must be longer than 0.5 s.
   none: no message said that output began or ended (session_output_running)

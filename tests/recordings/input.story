@@ -16,11 +16,7 @@ Messages, by the seconds since it began
   10  +20.5 s  Setup Stop: session_duration=19.5 session_input_running=0
 
 Made by the daemon
-  11  +21 s  Session_Generic Summary: total_active_time=19.5 active_count=1 overload_count=0
-    average_active_time=19.5 num_messages=10 num_unique_messages=12
-    num_redundant_messages=18446744073709551614 singleMessageSession=0 summaryServiceName=telephony
-    thermal_state=Nominal low_power_enabled=0 vmInfo_phys_footprint_MiB=8 load_avg_1_min=0
-    load_avg_5_min=0 load_avg_15_min=0
+  11  +21 s  Session_Generic Summary, which the store does not have
 
 Volume summaries: 0. A stretch of output must be longer than 0.5 s.
   none: no message said that output began or ended (session_output_running)
@@ -29,7 +25,7 @@ Gather summaries: 0. A stretch of output must be longer than 0.5 s.
 Input summaries: 2. A stretch of input must be longer than 0.5 s.
   +1 s  input began (message 1)
   +1 s to +11 s, 10 s  active_devices changed from Mic to Headset (message 6) -> Input Summary 1 of
-    2, event 1; made of messages 1, 2, 3, 4, 5 and 6
+    2, event 1; made of messages 1 to 6
   +11 s to +11.5 s, 0.5 s  active_devices changed from Headset to Mic (message 7) -> no summary: 0.5
     s is not longer than 0.5 s
   +11.5 s to +12.5 s, 1 s  input stopped (message 8) -> Input Summary 2 of 2, event 2; made of

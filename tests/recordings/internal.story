@@ -10,7 +10,7 @@ Messages, by the seconds since it began
   5  +33 s  RouteChange Generic: route=Speaker sendSingleMessage=1
 
 Made by the daemon
-  6  +34 s  Session_Generic Summary: total_active_time=0 active_count=0 overload_count=0
+  6  +34 s  Session_Generic Summary, event 10: total_active_time=0 active_count=0 overload_count=0
     average_active_time=0 num_messages=5 num_unique_messages=7
     num_redundant_messages=18446744073709551614 singleMessageSession=0 summaryServiceName=telephony
     thermal_state=Nominal low_power_enabled=0 vmInfo_phys_footprint_MiB=8 load_avg_1_min=0
@@ -36,7 +36,7 @@ Messages, by the seconds since it began
   4  +33 s  RouteChange Generic: route=Speaker sendSingleMessage=1
 
 Made by the daemon
-  5  +34 s  Session_Generic Summary: total_active_time=0 active_count=0 overload_count=0
+  5  +34 s  Session_Generic Summary, event 12: total_active_time=0 active_count=0 overload_count=0
     average_active_time=0 num_messages=4 num_unique_messages=6
     num_redundant_messages=18446744073709551614 singleMessageSession=0 summaryServiceName=alarms
     thermal_state=Nominal low_power_enabled=0 vmInfo_phys_footprint_MiB=8 load_avg_1_min=0

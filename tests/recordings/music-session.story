@@ -14,7 +14,7 @@ Messages, by the seconds since it began
   8  +6 s  Session_Setup Stop: session_duration=6
 
 Made by the daemon
-  12  +6.1 s  Session_Generic Summary: total_active_time=6 active_count=1 overload_count=1
+  12  +6.1 s  Session_Generic Summary, event 12: total_active_time=6 active_count=1 overload_count=1
     average_active_time=6 num_messages=11 num_unique_messages=13
     num_redundant_messages=18446744073709551614 singleMessageSession=0
     summaryServiceName=longformaudio thermal_state=Nominal low_power_enabled=0

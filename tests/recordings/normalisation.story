@@ -13,7 +13,7 @@ Messages, by the seconds since it began
 € list=[1,{"a":false}] big=18446744073709551615
 
 Made by the daemon
-  8  +8 s  Session_Generic Summary: total_active_time=0 active_count=0 overload_count=0
+  8  +8 s  Session_Generic Summary, event 8: total_active_time=0 active_count=0 overload_count=0
     average_active_time=0 num_messages=7 num_unique_messages=9
     num_redundant_messages=18446744073709551614 singleMessageSession=0
     summaryServiceName=longformaudio thermal_state=Nominal low_power_enabled=0

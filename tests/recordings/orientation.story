@@ -8,7 +8,7 @@ Messages, by the seconds since it began
   3  +9 s  Output Stop: session_output_running=0
 
 Made by the daemon
-  4  +10 s  Session_Generic Summary: total_active_time=0 active_count=0 overload_count=0
+  4  +10 s  Session_Generic Summary, event 4: total_active_time=0 active_count=0 overload_count=0
     average_active_time=0 num_messages=3 num_unique_messages=5
     num_redundant_messages=18446744073709551614 singleMessageSession=0
     summaryServiceName=longformaudio thermal_state=Nominal low_power_enabled=0

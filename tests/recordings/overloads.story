@@ -15,7 +15,7 @@ Messages, by the seconds since it began
   8  +8 s  Setup Stop: session_duration=5
 
 Made by the daemon
-  9  +9 s  Session_Generic Summary: total_active_time=8 active_count=2 overload_count=3
+  9  +9 s  Session_Generic Summary, event 1: total_active_time=8 active_count=2 overload_count=3
     average_active_time=4 num_messages=8 num_unique_messages=10
     num_redundant_messages=18446744073709551614 singleMessageSession=0
     summaryServiceName=longformaudio thermal_state=Nominal low_power_enabled=0

@@ -18,7 +18,7 @@ Messages, by the seconds since it began
   13  +13 s  Generic Generic: redundant, it repeats message 12 in everything but its times
 
 Made by the daemon
-  14  +14 s  Session_Generic Summary: total_active_time=0 active_count=0 overload_count=0
+  14  +14 s  Session_Generic Summary, event 11: total_active_time=0 active_count=0 overload_count=0
     average_active_time=0 num_messages=13 num_unique_messages=12 num_redundant_messages=1
     singleMessageSession=0 summaryServiceName=longformaudio thermal_state=Nominal
     low_power_enabled=0 vmInfo_phys_footprint_MiB=8 load_avg_1_min=0 load_avg_5_min=0

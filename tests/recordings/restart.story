@@ -7,7 +7,7 @@ Messages, by the seconds since it began
   2  +5 s  Setup Stop: session_duration=4
 
 Made by the daemon
-  4  +6 s  Session_Generic Summary: total_active_time=4 active_count=1 overload_count=0
+  4  +6 s  Session_Generic Summary, event 3: total_active_time=4 active_count=1 overload_count=0
     average_active_time=4 num_messages=3 num_unique_messages=5
     num_redundant_messages=18446744073709551614 singleMessageSession=0
     summaryServiceName=longformaudio thermal_state=Nominal low_power_enabled=0
@@ -37,7 +37,7 @@ Messages, by the seconds since it began
   3  +5 s  Output Stop: session_output_running=0 session_duration=3
 
 Made by the daemon
-  5  +6 s  Session_Generic Summary: total_active_time=7 active_count=2 overload_count=0
+  5  +6 s  Session_Generic Summary, event 6: total_active_time=7 active_count=2 overload_count=0
     average_active_time=3.5 num_messages=4 num_unique_messages=6
     num_redundant_messages=18446744073709551614 singleMessageSession=0
     summaryServiceName=longformaudio thermal_state=Nominal low_power_enabled=0
@@ -64,7 +64,7 @@ Messages, by the seconds since it began
   none
 
 Made by the daemon
-  1  +1 s  Session_Generic Summary: total_active_time=7 active_count=2 overload_count=0
+  1  +1 s  Session_Generic Summary, event 7: total_active_time=7 active_count=2 overload_count=0
     average_active_time=3.5 num_messages=0 num_unique_messages=2
     num_redundant_messages=18446744073709551614 singleMessageSession=0
     summaryServiceName=longformaudio thermal_state=Nominal low_power_enabled=0

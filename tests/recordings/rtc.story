@@ -8,11 +8,7 @@ Messages, by the seconds since it began
   3  +3 s  HAL_Playback Generic: redundant, it repeats message 2 in everything but its times
 
 Made by the daemon
-  4  +4 s  Session_Generic Summary: total_active_time=0 active_count=0 overload_count=0
-    average_active_time=0 num_messages=3 num_unique_messages=4
-    num_redundant_messages=18446744073709551615 singleMessageSession=0
-    summaryServiceName=longformaudio thermal_state=Nominal low_power_enabled=0
-    vmInfo_phys_footprint_MiB=8 load_avg_1_min=0 load_avg_5_min=0 load_avg_15_min=0
+  4  +4 s  Session_Generic Summary, which the store does not have
 
 Volume summaries: 0. A stretch of output must be longer than 0.5 s.
   none: no message said that output began or ended (session_output_running)
@@ -32,11 +28,7 @@ Messages, by the seconds since it began
   2  +2 s  HAL_Playback Generic: a=2
 
 Made by the daemon
-  3  +4 s  Session_Generic Summary: total_active_time=0 active_count=0 overload_count=0
-    average_active_time=0 num_messages=2 num_unique_messages=4
-    num_redundant_messages=18446744073709551614 singleMessageSession=0 summaryServiceName=apiusage
-    thermal_state=Nominal low_power_enabled=0 vmInfo_phys_footprint_MiB=8 load_avg_1_min=0
-    load_avg_5_min=0 load_avg_15_min=0
+  3  +4 s  Session_Generic Summary, which the store does not have
 
 Volume summaries: 0. A stretch of output must be longer than 0.5 s.
   none: no message said that output began or ended (session_output_running)
@@ -56,11 +48,7 @@ Messages, by the seconds since it began
   2  +2 s  HAL_Playback Generic: a=2
 
 Made by the daemon
-  3  +4 s  Session_Generic Summary: total_active_time=0 active_count=0 overload_count=0
-    average_active_time=0 num_messages=2 num_unique_messages=4
-    num_redundant_messages=18446744073709551614 singleMessageSession=0 summaryServiceName=test
-    thermal_state=Nominal low_power_enabled=0 vmInfo_phys_footprint_MiB=8 load_avg_1_min=0
-    load_avg_5_min=0 load_avg_15_min=0
+  3  +4 s  Session_Generic Summary, which the store does not have
 
 Volume summaries: 0. A stretch of output must be longer than 0.5 s.
   none: no message said that output began or ended (session_output_running)
@@ -79,11 +67,7 @@ Messages, by the seconds since it began
   none
 
 Made by the daemon
-  1  +1 s  Session_Generic Summary: total_active_time=0 active_count=0 overload_count=0
-    average_active_time=0 num_messages=0 num_unique_messages=2
-    num_redundant_messages=18446744073709551614 singleMessageSession=0
-    summaryServiceName=longformaudio thermal_state=Nominal low_power_enabled=0
-    vmInfo_phys_footprint_MiB=8 load_avg_1_min=0 load_avg_5_min=0 load_avg_15_min=0
+  1  +1 s  Session_Generic Summary, which the store does not have
 
 Volume summaries: 0. A stretch of output must be longer than 0.5 s.
   none: no message said that output began or ended (session_output_running)

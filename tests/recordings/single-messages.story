@@ -18,7 +18,7 @@ Messages, by the seconds since it began
   1  +1 s  RouteChange Generic: route=Headphones
 
 Made by the daemon
-  2  +9 s  Session_Generic Summary: total_active_time=0 active_count=0 overload_count=0
+  2  +9 s  Session_Generic Summary, event 5: total_active_time=0 active_count=0 overload_count=0
     average_active_time=0 num_messages=1 num_unique_messages=3
     num_redundant_messages=18446744073709551614 singleMessageSession=0
     summaryServiceName=longformaudio thermal_state=Nominal low_power_enabled=0

@@ -20,11 +20,7 @@ Messages, by the seconds since it began
   13  +82 s  Setup Stop: session_duration=60
 
 Made by the daemon
-  21  +83 s  Session_Generic Summary: total_active_time=60 active_count=1 overload_count=0
-    average_active_time=60 num_messages=20 num_unique_messages=22
-    num_redundant_messages=18446744073709551614 singleMessageSession=0
-    summaryServiceName=longformaudio thermal_state=Nominal low_power_enabled=0
-    vmInfo_phys_footprint_MiB=8 load_avg_1_min=0 load_avg_5_min=0 load_avg_15_min=0
+  21  +83 s  Session_Generic Summary, which the store does not have
 
 Volume summaries: 7. A stretch of output must be longer than 0.5 s.
   message 10 was merged into message 9: 2 s after it is less than 5 s
@@ -32,7 +28,7 @@ Volume summaries: 7. A stretch of output must be longer than 0.5 s.
   +2 s to +5 s, 3 s  QMSessionVolume changed from 0.5 to 0.3 (message 3) -> Volume Summary 1 of 7,
     event 4; made of messages 2 and 3
   +5 s to +8 s, 3 s  QMSessionVolume changed from 0.3 to 0.25 (message 5) -> Volume Summary 2 of 7,
-    event 5; made of messages 3, 4 and 5
+    event 5; made of messages 3 to 5
   +8 s to +8.5 s, 0.5 s  QMSessionVolume changed from 0.25 to 0.75 (message 6) -> no summary: 0.5 s
     is not longer than 0.5 s
   +8.5 s to +20.5 s, 12 s  active_devices changed from Speaker to Headphones (message 7) -> Volume

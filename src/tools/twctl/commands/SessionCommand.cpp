@@ -41,7 +41,15 @@ bool find(Tool& tool, SqlReader& reader, std::int64_t id, KnownSession& known) {
   }
   known.session = *session;
   known.records = *std::move(records);
-  known.life = known.replay.play(tool, known.session);
+  ReasonedLife* life = known.replay.play(tool, known.session);
+  known.life = life;
+  if (life == nullptr) return true;
+  const auto events = readPayloads(reader, id, problem);
+  if (!events) {
+    tool.status = tool.fail(kRefused, problem);
+    return false;
+  }
+  nameEvents(*life, *events, tool.json);
   return true;
 }
 
@@ -125,7 +133,7 @@ void printObjects(Tool& tool, const KnownSession& known, const StoredEventRow& e
     for (const Value& number : *end->find(reasons::kMessages)->asArray()) {
       if (const ValueMap* message = known.life->message(number.integer())) printLine(tool, *message);
     }
-  } else if (const ValueMap* message = known.life->messageOf(event)) {
+  } else if (const ValueMap* message = known.life->messageOf(event.id)) {
     for (const ValueMap* equal : known.life->equalTo(message->integer(reasons::kNumber)))
       printLine(tool, *equal);
   }

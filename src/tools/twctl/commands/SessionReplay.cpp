@@ -72,7 +72,7 @@ std::string record(const Tool& tool, const StoredSession& session, const std::st
 
 }  // namespace
 
-const ReasonedLife* SessionReplay::play(const Tool& tool, const StoredSession& session) {
+ReasonedLife* SessionReplay::play(const Tool& tool, const StoredSession& session) {
   PrivateDirectory directory;
   if (const std::error_code error = directory.make()) {
     why_ = "no directory for the replay: " + error.message();
@@ -96,8 +96,11 @@ const ReasonedLife* SessionReplay::play(const Tool& tool, const StoredSession& s
   if (!lives) return nullptr;
   lives_ = std::move(*lives);
   const ReasonedLife* life = lifeOf(lives_, session);
-  if (life == nullptr) why_ = "the journal no longer has its requests";
-  return life;
+  if (life == nullptr) {
+    why_ = "the journal no longer has its requests";
+    return nullptr;
+  }
+  return &lives_[static_cast<std::size_t>(life - lives_.data())];
 }
 
 }  // namespace tonewerk

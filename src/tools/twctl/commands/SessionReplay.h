@@ -14,7 +14,7 @@ namespace tonewerk {
 class SessionReplay {
  public:
   // Null when that is not possible; why() then says why. Valid as long as the object.
-  const ReasonedLife* play(const Tool& tool, const StoredSession& session);
+  ReasonedLife* play(const Tool& tool, const StoredSession& session);
   const std::string& why() const { return why_; }
 
  private:

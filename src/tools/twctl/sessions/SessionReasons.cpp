@@ -5,9 +5,13 @@
 #include <cmath>
 #include <istream>
 #include <map>
+#include <tuple>
+#include <unordered_map>
+#include <utility>
 
 #include "platform/JsonService.h"
 #include "tools/recording/ReasonKeys.h"
+#include "values/CompactJson.h"
 
 namespace tonewerk {
 namespace {
@@ -42,13 +46,80 @@ bool take(const ValueMap& line, ReasonedLife& life) {
   return true;
 }
 
+std::string payloadOf(const ValueMap& message) {
+  const Value* payload = message.find(reasons::kPayload);
+  ValueMap map = payload == nullptr || payload->asMap() == nullptr ? ValueMap() : *payload->asMap();
+  map.erase("twreporting_timestamp");
+  std::string text;
+  appendCompactJson(text, map);
+  return text;
+}
+
+// Finds the next message that says what an event says.
+class SamePayload {
+ public:
+  explicit SamePayload(const std::vector<ValueMap*>& messages) {
+    for (std::size_t place = 0; place < messages.size(); ++place)
+      places_[payloadOf(*messages[place])].push_back(place);
+  }
+
+  // The first place from `from` on; none when there is none.
+  std::optional<std::size_t> find(const std::string& payload, std::size_t from) const {
+    const auto found = places_.find(payload);
+    if (found == places_.end()) return std::nullopt;
+    const auto next = std::lower_bound(found->second.begin(), found->second.end(), from);
+    return next == found->second.end() ? std::nullopt : std::optional(*next);
+  }
+
+ private:
+  std::unordered_map<std::string, std::vector<std::size_t>> places_;  // ascending
+};
+
+// What the daemon made: the values are the store's, so only the order tells which is which.
+void nameDerived(ReasonedLife& life, const std::vector<ValueMap*>& messages,
+                 const std::vector<const StoredPayload*>& events, const JsonService& json) {
+  for (std::size_t place = 0; place < events.size(); ++place) {
+    if (place >= messages.size()) {
+      life.onlyStored.push_back(*events[place]);
+      continue;
+    }
+    std::string ignored;
+    messages[place]->set(kMessageKeyEvent, events[place]->event);
+    if (auto payload = json.parse(events[place]->payload, ignored))
+      messages[place]->set(reasons::kPayload, *std::move(payload));
+  }
+  for (std::size_t place = events.size(); place < messages.size(); ++place)
+    messages[place]->erase(reasons::kPayload);
+}
+
+// What clients sent. When there are as many messages as events, each became the event at its place. Else some
+// are missing: the oldest ones, those that no consumer asked for, or the newest ones of a session that runs.
+// Then those belong together that say the same.
+void nameSent(const std::vector<ValueMap*>& messages, const std::vector<const StoredPayload*>& events) {
+  if (messages.size() == events.size()) {
+    for (std::size_t place = 0; place < events.size(); ++place)
+      messages[place]->set(kMessageKeyEvent, events[place]->event);
+    return;
+  }
+  const SamePayload same(messages);
+  std::size_t from = 0;
+  for (const StoredPayload* event : events) {
+    const std::optional<std::size_t> place = same.find(event->payload, from);
+    if (!place) continue;
+    messages[*place]->set(kMessageKeyEvent, event->event);
+    from = *place + 1;
+  }
+}
+
 }  // namespace
 
 const ValueMap* ReasonedLife::message(std::int64_t number) const {
-  const auto found = std::find_if(messages.begin(), messages.end(), [number](const ValueMap& message) {
-    return message.integer(reasons::kNumber) == number;
-  });
-  return found == messages.end() ? nullptr : &*found;
+  const auto found = std::lower_bound(messages.begin(), messages.end(), number,
+                                      [](const ValueMap& message, std::int64_t wanted) {
+                                        return message.integer(reasons::kNumber) < wanted;
+                                      });
+  const bool isFound = found != messages.end() && found->integer(reasons::kNumber) == number;
+  return isFound ? &*found : nullptr;
 }
 
 std::vector<const ValueMap*> ReasonedLife::equalTo(std::int64_t number) const {
@@ -74,12 +145,9 @@ const ValueMap* ReasonedLife::summaryEnd(const std::string& category, std::int64
   return given == found->steps.end() ? nullptr : &*given;
 }
 
-const ValueMap* ReasonedLife::messageOf(const StoredEventRow& event) const {
-  constexpr double kSameSeconds = 1e-4;
-  const auto found = std::find_if(messages.begin(), messages.end(), [&](const ValueMap& message) {
-    return message.text(reasons::kCategory) == event.category && message.text(reasons::kType) == event.type &&
-           !message.boolean(reasons::kRedundant) && event.sentAt &&
-           std::abs(message.number(reasons::kAt) - *event.sentAt) < kSameSeconds;
+const ValueMap* ReasonedLife::messageOf(std::int64_t event) const {
+  const auto found = std::find_if(messages.begin(), messages.end(), [event](const ValueMap& message) {
+    return message.integer(kMessageKeyEvent) == event;
   });
   return found == messages.end() ? nullptr : &*found;
 }
@@ -110,13 +178,42 @@ std::optional<std::vector<ReasonedLife>> readReasons(std::istream& text, const J
   return all;
 }
 
+void nameEvents(ReasonedLife& life, const std::vector<StoredPayload>& events, const JsonService& json) {
+  // Those of one category, type and source, in order.
+  using Kind = std::tuple<std::string, std::string, bool>;
+  std::map<Kind, std::pair<std::vector<ValueMap*>, std::vector<const StoredPayload*>>> kinds;
+  for (ValueMap& message : life.messages) {
+    if (message.boolean(reasons::kRedundant)) continue;
+    const Kind kind(message.text(reasons::kCategory), message.text(reasons::kType),
+                    message.boolean(reasons::kDerived));
+    kinds[kind].first.push_back(&message);
+  }
+  for (const StoredPayload& event : events) {
+    const bool isDerived = event.source == "derived" ||
+                           (event.source.empty() && !kinds.contains({event.category, event.type, false}));
+    kinds[{event.category, event.type, isDerived}].second.push_back(&event);
+  }
+  for (const auto& [kind, found] : kinds) {
+    if (std::get<bool>(kind)) {
+      nameDerived(life, found.first, found.second, json);
+    } else {
+      nameSent(found.first, found.second);
+    }
+  }
+}
+
 const ReasonedLife* lifeOf(const std::vector<ReasonedLife>& lives, const StoredSession& session) {
-  const auto found = std::find_if(lives.begin(), lives.end(), [&session](const ReasonedLife& life) {
-    return life.reporterID == session.reporterID && life.user == session.user &&
-           (!life.process || !session.process || *life.process == *session.process) && life.startedAt &&
-           std::abs(*life.startedAt - session.startedAt) < kSameTime;
-  });
-  return found == lives.end() ? nullptr : &*found;
+  const ReasonedLife* nearest = nullptr;
+  double nearestPause = kSameTime;
+  for (const ReasonedLife& life : lives) {
+    if (life.reporterID != session.reporterID || life.user != session.user || !life.startedAt) continue;
+    if (life.process && session.process && *life.process != *session.process) continue;
+    const double pause = std::abs(*life.startedAt - session.startedAt);
+    if (pause >= nearestPause) continue;
+    nearest = &life;
+    nearestPause = pause;
+  }
+  return nearest;
 }
 
 }  // namespace tonewerk

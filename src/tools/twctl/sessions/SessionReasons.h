@@ -5,6 +5,7 @@
 #include <iosfwd>
 #include <optional>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "tools/twctl/sessions/SessionRecords.h"
@@ -14,6 +15,9 @@
 namespace tonewerk {
 
 class JsonService;
+
+// Which event of the store a message became; absent when that is not known, and for a redundant one.
+inline constexpr std::string_view kMessageKeyEvent = "event";
 
 // Why the core did what it did in one life of a session, as it told when the session was played again. The
 // maps have the keys of tools/recording/ReasonKeys.h.
@@ -32,6 +36,8 @@ struct ReasonedLife {
   std::vector<ValueMap> messages;   // "message", in the order of their arrival
   std::vector<Walk> walks;
   std::optional<ValueMap> end;  // "end"
+  // What the daemon made and the store has, but not the replay, which has no device. With nameEvents().
+  std::vector<StoredPayload> onlyStored;
 
   // Null when there is no such message.
   const ValueMap* message(std::int64_t number) const;
@@ -39,8 +45,8 @@ struct ReasonedLife {
   std::vector<const ValueMap*> equalTo(std::int64_t number) const;
   // The "stretchEnd" that gave the summary with this number; null when there was none.
   const ValueMap* summaryEnd(const std::string& category, std::int64_t index) const;
-  // The message that the store has as this event; null when it is not known.
-  const ValueMap* messageOf(const StoredEventRow& event) const;
+  // The message that the store has as this event; null when it is not known. With nameEvents().
+  const ValueMap* messageOf(std::int64_t event) const;
   // The walk for the summaries of this category; null when there was none.
   const Walk* walk(const std::string& category) const;
 };
@@ -49,6 +55,12 @@ struct ReasonedLife {
 [[nodiscard]] std::optional<std::vector<ReasonedLife>> readReasons(std::istream& text,
                                                                    const JsonService& json,
                                                                    std::string& problem);
+
+// Says which events of the session its messages became. Those of a category and type came in the same order.
+// Their times differ: where a client gave none, the replay has that of the journal. A message that the daemon
+// made gets the payload that was recorded instead of the replay's, which has other values of the device, and
+// none when the store does not have it.
+void nameEvents(ReasonedLife& life, const std::vector<StoredPayload>& events, const JsonService& json);
 
 // The life of a session in the store; null when there is none. Clients may use the same identifier at the
 // same time, so users and processes are compared, too.

@@ -59,17 +59,32 @@ std::optional<SessionRecords> readRecords(SqlReader& reader, std::int64_t sessio
   return isRead ? std::optional(std::move(records)) : std::nullopt;
 }
 
+std::optional<std::vector<StoredPayload>> readPayloads(SqlReader& reader, std::int64_t session,
+                                                       std::string& problem) {
+  std::vector<StoredPayload> events;
+  const bool isRead = eachRow(
+      reader,
+      "SELECT id, category, type, coalesce(source, ''), at, json_remove(payload, "
+      "'$.twreporting_timestamp') FROM event WHERE session = " +
+          std::to_string(session) + " ORDER BY id",
+      {}, problem, [&](const ViewRow& row) {
+        events.push_back({row.integer(0).value_or(0), row.text(1).value_or(""), row.text(2).value_or(""),
+                          row.text(3).value_or(""), row.number(4).value_or(0.0), row.text(5).value_or("")});
+      });
+  return isRead ? std::optional(std::move(events)) : std::nullopt;
+}
+
 std::optional<StoredEventRow> readEvent(SqlReader& reader, std::int64_t id, std::string& problem) {
   std::optional<StoredEventRow> event;
   const bool isRead = eachRow(
       reader,
-      "SELECT id, at, session, category, type, coalesce(source, ''), payload ->> "
-      "'twreporting_timestamp', payload ->> 'msgidx' FROM event WHERE id = " +
+      "SELECT id, at, session, category, type, coalesce(source, ''), payload ->> 'msgidx' FROM event WHERE "
+      "id = " +
           std::to_string(id),
       {}, problem, [&](const ViewRow& row) {
         event = {
             row.integer(0).value_or(0), row.number(1).value_or(0.0), row.integer(2), row.text(3).value_or(""),
-            row.text(4).value_or(""),   row.text(5).value_or(""),    row.number(6),  row.integer(7)};
+            row.text(4).value_or(""),   row.text(5).value_or(""),    row.integer(6)};
       });
   if (!isRead || event) return event;
   problem = "the store has no event " + std::to_string(id);

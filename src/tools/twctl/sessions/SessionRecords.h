@@ -57,12 +57,26 @@ struct StoredEventRow {
   std::string category;
   std::string type;
   std::string source;
-  std::optional<double> sentAt;         // what the message says of its time
   std::optional<std::int64_t> summary;  // its number among the summaries of its category
 
   // Whether it may be the summary of a stretch.
   bool isSummary() const { return source != "client" && type == "Summary" && summary; }
 };
+
+// What an event of a session says.
+struct StoredPayload {
+  std::int64_t event = 0;
+  std::string category;
+  std::string type;
+  std::string source;   // "client" or "derived"; empty when it is not known
+  double at = 0.0;      // when it was recorded, in seconds since 1970
+  std::string payload;  // JSON, without the time of the message
+};
+
+// The events of a session, in the order in which they were recorded. None when the store cannot be read;
+// `problem` then says why.
+[[nodiscard]] std::optional<std::vector<StoredPayload>> readPayloads(SqlReader& reader, std::int64_t session,
+                                                                     std::string& problem);
 
 // None when there is no such event, or when the store cannot be read; `problem` then says what was not found
 // and how to list what there is.

@@ -47,11 +47,21 @@ std::string listOf(const std::vector<std::string>& words) {
   return text;
 }
 
-// "message 2", "messages 2 and 3"
+// "message 2", "messages 2 and 3", "messages 2 to 900 and 903"
 std::string messagesText(const ValueArray& numbers) {
+  constexpr std::int64_t kFewestOfRange = 3;
   std::vector<std::string> words;
-  for (const Value& number : numbers) words.push_back(number.text());
-  return (words.size() == 1 ? "message " : "messages ") + listOf(words);
+  for (std::size_t at = 0; at < numbers.size();) {
+    const std::int64_t first = numbers[at].integer();
+    std::int64_t last = first;
+    for (++at; at < numbers.size() && numbers[at].integer() == last + 1; ++at) ++last;
+    if (last - first + 1 >= kFewestOfRange) {
+      words.push_back(std::to_string(first) + " to " + std::to_string(last));
+    } else {
+      for (std::int64_t number = first; number <= last; ++number) words.push_back(std::to_string(number));
+    }
+  }
+  return (numbers.size() == 1 ? "message " : "messages ") + listOf(words);
 }
 
 // What a key says that runs: "output" of "session_output_running".
@@ -66,6 +76,21 @@ std::string endingText(const StoredSession& session) {
   if (ending == "disconnected") return "its client had gone";
   if (ending == "interrupted") return "the daemon had gone";
   return ending;
+}
+
+// How the daemon makes messages that are no summaries of stretches.
+std::string howMade(const StoredEventRow& event) {
+  if (event.category == "Session_Generic" && event.type == "Summary") {
+    return "The daemon makes one for each session when it stops: of all its messages, of when output or "
+           "input "
+           "ran, and of the device at that moment.";
+  }
+  if (event.category == "Chanmetering") {
+    return "The daemon makes it when a session stops, of how a driver's counters changed since its start.";
+  }
+  if (event.type == "Summary")
+    return "No stretch gave it when the session was played again: the replay has the preferences of now.";
+  return "The daemon sends it to started sessions, because the system told it, or a new value of it.";
 }
 
 }  // namespace
@@ -133,7 +158,9 @@ std::string SessionStory::messageLine(const ValueMap& message) const {
   if (!message.boolean(reasons::kKept)) line += " (not kept: its client's sessions had no room)";
   const Value* payload = message.find(reasons::kPayload);
   const ValueMap* map = payload == nullptr ? nullptr : payload->asMap();
-  if (map == nullptr) return line;
+  if (map == nullptr) return line + ", which the store does not have";
+  if (message.boolean(reasons::kDerived) && message.contains(kMessageKeyEvent))
+    line += ", event " + message.text(kMessageKeyEvent);
   std::string separator = ":";
   for (const ValueMap::Entry& entry : *map) {
     if (std::find(kHidden.begin(), kHidden.end(), entry.key.view()) != kHidden.end()) continue;
@@ -148,8 +175,18 @@ void SessionStory::messages(std::string& text, bool areDerived) const {
     // The stretches tell more of those summaries.
     const bool isOfStretch =
         message.text(reasons::kType) == "Summary" && life_->walk(message.text(reasons::kCategory)) != nullptr;
-    if (message.boolean(reasons::kDerived) == areDerived && !(areDerived && isOfStretch))
-      add(text, std::string(kIndent, ' ') + messageLine(message), 2 * kIndent);
+    if (message.boolean(reasons::kDerived) != areDerived || (areDerived && isOfStretch)) continue;
+    // The replay stops a session that still runs, which makes messages that the daemon has not made yet.
+    const bool isNotYet = areDerived && !session_.endedAt && !message.contains(kMessageKeyEvent);
+    if (!isNotYet) add(text, std::string(kIndent, ' ') + messageLine(message), 2 * kIndent);
+  }
+  if (!areDerived) return;
+  for (const StoredPayload& event : life_->onlyStored) {
+    add(text,
+        std::string(kIndent, ' ') + since(event.at) + "  " + event.category + " " + event.type + ", event " +
+            std::to_string(event.event) +
+            ": the session has it, but its replay does not, so the reasons may differ from what happened",
+        2 * kIndent);
   }
 }
 
@@ -175,8 +212,9 @@ std::string SessionStory::outcomeOf(const ReasonedLife::Walk& walk, const ValueM
   if (outcome == reasons::kOutcomeSummary) {
     const std::int64_t index = end.integer(reasons::kIndex);
     const auto event = records_.summaries.find({category, index});
-    const std::string known = event == records_.summaries.end() ? ", which the store does not have"
-                                                                : ", event " + std::to_string(event->second);
+    std::string known;
+    if (event != records_.summaries.end()) known = ", event " + std::to_string(event->second);
+    if (known.empty() && session_.endedAt) known = ", which the store does not have";
     const Value* messages = end.find(reasons::kMessages);
     const ValueArray* numbers = messages == nullptr ? nullptr : messages->asArray();
     const bool areKnown = numbers != nullptr && numbers->size() > 0;
@@ -393,13 +431,19 @@ std::string SessionStory::event(const StoredEventRow& event) const {
     }
     return text;
   }
-  if (const ValueMap* message = life_->messageOf(event)) {
+  if (event.source == "derived") {
+    add(text, howMade(event));
+    return text;
+  }
+  if (const ValueMap* message = life_->messageOf(event.id)) {
     add(text, "It is message " + messageLine(*message) + ".", kIndent);
     add(text, "It was recorded, because it repeated no earlier message of its category and type. " +
                   repeatedBy(message->integer(reasons::kNumber)));
     return text;
   }
-  add(text, "No rule told anything about it when the session was played again.");
+  add(text,
+      "Which of the session's messages it was is not known: the store does not have all of them, or not "
+      "all of this one.");
   return text;
 }
 
