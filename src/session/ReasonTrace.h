@@ -116,7 +116,8 @@ class ReasonTrace {
     std::optional<double> until;
     Outcome outcome = Outcome::kSummary;
     std::int32_t index = 0;  // of the summary, from 1
-    // From the beginning to the message that ended it, those that have one of the producer's keys.
+    // Those that said earlier what still held when it ended, such as the device; and from the beginning to
+    // the message that ended it, those that have one of the producer's keys. In order.
     std::span<const ValueMap* const> messages;
   };
   virtual void stretchEnded(const End& end) = 0;

@@ -165,8 +165,12 @@ TEST_F(VolumeStoryTest, SaysWhatMadeAnEvent) {
   played_.tell(session, 200, [&](const SessionStory& story) { text = story.event(*event); });
   EXPECT_THAT(text, testing::HasSubstr("+8.5 s to +20.5 s, 12 s  active_devices changed from Speaker to "
                                        "Headphones (message 7) -> Volume Summary 3 of 7, event " +
-                                       std::to_string(summary) + "; made of messages 6 and 7\n"));
+                                       std::to_string(summary) + "; made of messages 1, 4, 6 and 7\n"));
   EXPECT_THAT(text, testing::HasSubstr("6  +8.5 s  Volume Generic: QMSessionVolume=0.75\n"));
+  // Messages 1 and 4 said the device and the format, long before the stretch.
+  EXPECT_THAT(text, testing::HasSubstr("\n  1  +1 s  Setup Generic: "));
+  EXPECT_THAT(text, testing::HasSubstr("active_devices=Speaker"));
+  EXPECT_THAT(text, testing::HasSubstr("\n  4  +6 s  Setup Setup: mFormatID=aac"));
 }
 
 TEST_F(VolumeStoryTest, SaysOfWhatTheSummaryOfASessionIsMade) {

@@ -30,7 +30,7 @@ Volume summaries: 2. A stretch of output must be longer than 0.5 s.
   -29.9 s to -19.8 s, 10.1 s  QMSessionVolume changed from 0.5 to 0.8 (message 2) -> Volume Summary
     1 of 2, event 10; made of messages 1 and 2
   -19.8 s to -4.2 s, 15.6 s  output stopped (message 8) -> Volume Summary 2 of 2, event 11; made of
-    messages 2 and 8
+    messages 1, 2 and 8
 Gather summaries: 1. A stretch of output must be longer than 0.5 s.
   -29.9 s  output began (message 1)
   -29.9 s to -4.2 s, 25.7 s  output stopped (message 8) -> Gather Summary 1 of 1, event 12; made of
@@ -38,7 +38,7 @@ Gather summaries: 1. A stretch of output must be longer than 0.5 s.
 Input summaries: 1. A stretch of input must be longer than 0.5 s.
   -17.7 s  input began (message 3)
   -17.7 s to -7.3 s, 10.4 s  input stopped (message 7) -> Input Summary 1 of 1, event 14; made of
-    messages 3, 4 and 7
+    messages 1, 3, 4 and 7
 
 Issues
   +0.5 s  overload at mixer, 2 s of silence (event 5)

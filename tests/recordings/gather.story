@@ -37,15 +37,15 @@ Gather summaries: 4. A stretch of output must be longer than 0.5 s.
   +1 s to +13 s, 12 s  session_selected_format changed from A to B (message 2) -> Gather Summary 1
     of 4, event 1; made of messages 1 and 2
   +13 s to +15 s, 2 s  output stopped (message 3) -> Gather Summary 2 of 4, event 2; made of
-    messages 2 and 3
+    messages 1 to 3
   +20 s  output began (message 4); that begins no stretch, because the message does not say
     gather_session=1
   until +25 s  output stopped (message 5) -> no summary: no message that counts says when it began
   +30 s  output began (message 6)
   +30 s to +34 s, 4 s  gather_session=0 came again (message 8) -> Gather Summary 3 of 4, event 3;
-    made of messages 6 to 8
+    made of messages 1, 2 and 6 to 8
   +34 s to +40 s, 6 s  the client said how long the session was (message 9) -> Gather Summary 4 of
-    4, event 4; made of messages 8 and 9
+    4, event 4; made of messages 1, 2, 8 and 9
 Input summaries: 0. A stretch of input must be longer than 0.5 s.
   none: no message said that input began or ended (session_input_running)
 

@@ -29,7 +29,7 @@ Input summaries: 2. A stretch of input must be longer than 0.5 s.
   +11 s to +11.5 s, 0.5 s  active_devices changed from Headset to Mic (message 7) -> no summary: 0.5
     s is not longer than 0.5 s
   +11.5 s to +12.5 s, 1 s  input stopped (message 8) -> Input Summary 2 of 2, event 2; made of
-    messages 7 and 8
+    messages 1, 5, 7 and 8
   +20 s  input began (message 9)
   +20 s to +20.5 s, 0.5 s  input stopped (message 10) -> no summary: 0.5 s is not longer than 0.5 s
 

@@ -23,11 +23,11 @@ Made by the daemon
 Volume summaries: 3. A stretch of output must be longer than 0.5 s.
   +0.4 s  output began (message 3)
   +0.4 s to +2.4 s, 2 s  QMSessionVolume changed from 0.5 to 0.8 (message 4) -> Volume Summary 1 of
-    3, event 9; made of messages 3 and 4
+    3, event 9; made of messages 1 to 4
   +2.4 s to +4.4 s, 2 s  active_devices changed from Speaker to Headphones (message 6) -> Volume
-    Summary 2 of 3, event 10; made of messages 4 and 6
+    Summary 2 of 3, event 10; made of messages 1, 2, 4 and 6
   +4.4 s to +5.9 s, 1.5 s  output stopped (message 7) -> Volume Summary 3 of 3, event 11; made of
-    messages 6 and 7
+    messages 1, 4, 6 and 7
 Gather summaries: 0. A stretch of output must be longer than 0.5 s.
   +0.4 s  output began (message 3); that begins no stretch, because the message does not say
     gather_session=1

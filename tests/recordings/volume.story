@@ -26,22 +26,22 @@ Volume summaries: 7. A stretch of output must be longer than 0.5 s.
   message 10 was merged into message 9: 2 s after it is less than 5 s
   +2 s  output began (message 2)
   +2 s to +5 s, 3 s  QMSessionVolume changed from 0.5 to 0.3 (message 3) -> Volume Summary 1 of 7,
-    event 4; made of messages 2 and 3
+    event 4; made of messages 1 to 3
   +5 s to +8 s, 3 s  QMSessionVolume changed from 0.3 to 0.25 (message 5) -> Volume Summary 2 of 7,
-    event 5; made of messages 3 to 5
+    event 5; made of messages 1 and 3 to 5
   +8 s to +8.5 s, 0.5 s  QMSessionVolume changed from 0.25 to 0.75 (message 6) -> no summary: 0.5 s
     is not longer than 0.5 s
   +8.5 s to +20.5 s, 12 s  active_devices changed from Speaker to Headphones (message 7) -> Volume
-    Summary 3 of 7, event 6; made of messages 6 and 7
+    Summary 3 of 7, event 6; made of messages 1, 4, 6 and 7
   +20.5 s to +22.5 s, 2 s  ringerstate changed from 0 to 1 (message 8) -> Volume Summary 4 of 7,
-    event 7; made of messages 7 and 8
+    event 7; made of messages 1, 4 and 6 to 8
   +22.5 s to +26.5 s, 4 s  spatializationEnabled changed from 0 to 1 (message 9) -> Volume Summary 5
-    of 7, event 8; made of messages 8 and 9
+    of 7, event 8; made of messages 1, 4 and 6 to 9
   +26.5 s to +36.5 s, 10 s  output stopped (message 11) -> Volume Summary 6 of 7, event 9; made of
-    messages 9 and 11
+    messages 1, 4, 6 to 9 and 11
   +40 s  output began (message 12)
   +40 s to +82 s, 42 s  the client said how long the session was (message 13) -> Volume Summary 7 of
-    7, event 10; made of messages 12 and 13
+    7, event 10; made of messages 1, 4, 6 to 9, 12 and 13
 Gather summaries: 0. A stretch of output must be longer than 0.5 s.
   +83 s  output runs before the first message, as the latest values of the session say; this is
     their time

@@ -2,6 +2,7 @@
 #include "workers/producers/IntervalWalk.h"
 
 #include <memory>
+#include <set>
 #include <utility>
 
 #include "session/ForEachMessage.h"
@@ -48,6 +49,7 @@ ValueView IntervalWalk::Latest::find() {
     const ValueView found = in(place - 1);
     if (!found) continue;
     value_ = found;
+    source_ = place;
     break;
   }
   searched_ = current;
@@ -221,10 +223,16 @@ std::optional<double> IntervalWalk::measure(const std::optional<Value>& end) {
 }
 
 void IntervalWalk::tellEnd(ReasonTrace& reasons, const std::optional<Value>& end) {
-  std::vector<const ValueMap*> messages;
-  for (std::size_t place = beginPlace_; place < walked_.size(); ++place) {
-    if (keys_.hasAny(*walked_[place])) messages.push_back(walked_[place]);
+  std::set<std::size_t> places;
+  for (Latest* latest : latest_) {
+    if (const auto place = latest->source()) places.insert(*place);
   }
+  for (std::size_t place = beginPlace_; place < walked_.size(); ++place) {
+    if (keys_.hasAny(*walked_[place])) places.insert(place);
+  }
+  std::vector<const ValueMap*> messages;
+  messages.reserve(places.size());
+  for (const std::size_t place : places) messages.push_back(walked_[place]);
   ReasonTrace::End told{.message = message(),
                         .cause = cause_,
                         .from = secondsOf(begin_),

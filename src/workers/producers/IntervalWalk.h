@@ -87,7 +87,9 @@ class IntervalWalk {
     // `initial` is the value when neither the messages nor the previous values have the key. It outlives the
     // walk; null for none. Made with the walk, which from then on looks at the messages that have the key.
     Latest(IntervalWalk& walk, std::string_view key, const Value* initial = nullptr)
-        : walk_(walk), name_(key), key_(walk.keys_.add(key)), initial_(initial) {}
+        : walk_(walk), name_(key), key_(walk.keys_.add(key)), initial_(initial) {
+      if (ReasonTrace::current() != nullptr) walk_.latest_.push_back(this);
+    }
     Latest(const Latest&) = delete;
     Latest& operator=(const Latest&) = delete;
 
@@ -104,6 +106,11 @@ class IntervalWalk {
     bool changes();
 
     std::string_view name() const { return name_; }
+    // For the trace of reasons: the place of the message that said what find() gives; none for other values.
+    std::optional<std::size_t> source() {
+      find();
+      return source_ == 0 ? std::nullopt : std::optional(source_ - 1);
+    }
 
    private:
     // Remembers a change for the trace of reasons.
@@ -119,6 +126,7 @@ class IntervalWalk {
     const Value* const initial_;
     ValueView value_;  // the latest one in the first searched_ messages
     std::size_t searched_ = 0;
+    std::size_t source_ = 0;    // place + 1 of the message that value_ is from; 0 for none
     bool hasBegun_ = false;     // false until value_ is the value before the first message
     std::size_t lookedUp_ = 0;  // place + 1 of the message that `found_` is from; 0 for none
     ValueView found_;
@@ -178,8 +186,9 @@ class IntervalWalk {
   TWReportingSessionMessages summaries_;
 
   // What the trace of reasons is told, if there is one.
-  Latest* change_ = nullptr;    // the value that changed last
-  std::size_t beginPlace_ = 0;  // in walked_, of the message that began the interval
+  std::vector<Latest*> latest_;  // all of them
+  Latest* change_ = nullptr;     // the value that changed last
+  std::size_t beginPlace_ = 0;   // in walked_, of the message that began the interval
   ReasonTrace::Cause cause_ = ReasonTrace::Cause::kStopped;
   ReasonTrace::Outcome outcome_ = ReasonTrace::Outcome::kSummary;
 };
