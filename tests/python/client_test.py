@@ -312,6 +312,20 @@ class ClientTest(DaemonTestCase):
         holder.join()
         self.assertEqual(os.waitstatus_to_exitcode(os.waitpid(child, 0)[1]), 5)
 
+    def test_a_forked_child_may_leave_the_blocks_of_its_parent(self):
+        program = (
+            "import os, sys\n"
+            "from tonewerk.reporting import Client\n"
+            "with Client() as client, client.session(7, 'org.example.Player') as session, session.playing(1):\n"
+            "    child = os.fork()\n"
+            "    if child == 0:\n"
+            "        sys.exit(5)\n"
+            "sys.exit(os.waitstatus_to_exitcode(os.waitpid(child, 0)[1]))\n"
+        )
+        environment = {**self.environment, "PYTHONPATH": str(SOURCE / "python")}
+        done = subprocess.run([sys.executable, "-B", "-c", program], env=environment, timeout=PATIENCE, check=False)
+        self.assertEqual(done.returncode, 5)
+
     def test_sends_what_is_queued_when_the_program_ends(self):
         self.start_daemon()
         program = (

@@ -332,7 +332,8 @@ class Client:
         problem: Optional[BaseException],
         trace: Optional[types.TracebackType],
     ) -> None:
-        self.close()
+        if not self.is_forked:  # a child that leaves the block may have another error, or an exit status
+            self.close()
 
     # ---- inside, on the caller's thread ----
 

@@ -245,7 +245,8 @@ class _AudioUse:
         problem: Optional[BaseException],
         trace: Optional[types.TracebackType],
     ) -> None:
-        self.stop()
+        if not self._session._client.is_forked:  # as the ends of sessions and clients
+            self.stop()
 
 
 class Playing(_AudioUse):
