@@ -92,42 +92,49 @@ class PreferenceFiles {
         findings_.add("unknown-key", inFile(path, line), isWritten ? remove + key : mend(path, key));
       }
       for (const std::string& line : preferenceProblems(domain, key, entry.value))
-        addWrong(path, domain, key, line);
+        addWrong(path, domain, key, line, isWritten);
     }
   }
 
   static std::string mend(const std::string& path, const std::string& key) {
-    return "rename or remove " + key + " in " + path;
+    return "edit or remove " + key + " in " + path;
   }
 
   void addWrong(const std::string& path, const std::string& domain, const std::string& key,
-                const std::string& line) {
+                const std::string& line, bool isWritten) {
     const Preference& known = *findPreference(domain, key);
     const bool isEndpoint =
         domain == LinuxLinkReport::kPreferenceDomain && key == LinuxLinkReport::kBackendsKey;
-    const std::string fallback = known.fallback && !known.fallback->asArray()
-                                     ? " write " + domain + " " + key + " " + typed(*known.fallback)
-                                     : " delete " + domain + " " + key;
+    const std::string defaults = checkup_.twctl() + " defaults";
+    std::string remedy = mend(path, key);
+    if (known.fallback && !known.fallback->asArray()) {
+      remedy =
+          defaults + " write " + domain + " " + key + " " + typed(*known.fallback) + ", or edit the file";
+    } else if (isWritten) {  // delete leaves the files of the configuration alone
+      remedy = defaults + " delete " + domain + " " + key + ", or edit the file";
+    }
     findings_.add(isEndpoint && line.starts_with("backends: ") ? "wrong-endpoint" : "wrong-value",
-                  path + ": " + line, checkup_.twctl() + " defaults" + fallback + ", or edit the file");
+                  path + ": " + line, remedy);
   }
 
   const Checkup& checkup_;
   Findings& findings_;
 };
 
-// What counts for a key, of those values that the checks have accepted.
-std::optional<Value> effective(const Checkup& checkup, std::string_view domain, std::string_view key) {
+// What counts for a key, of those values that the checks have accepted. `from` becomes its file.
+std::optional<Value> effective(const Checkup& checkup, std::string_view domain, std::string_view key,
+                               std::string& from) {
   std::optional<Value> value;
   for (const std::string& directory : {checkup.directories.configuration, checkup.directories.state}) {
     std::string text;
     std::string problem;
-    if (readFileBytes(directory + "/preferences/" + std::string(domain) + std::string(kEnding), text,
-                      nullptr))
-      continue;
+    const std::string path = directory + "/preferences/" + std::string(domain) + std::string(kEnding);
+    if (readFileBytes(path, text, nullptr)) continue;
     const std::optional<ValueMap> values = parseToml(text, problem);
     const Value* found = values ? values->find(key) : nullptr;
-    if (found != nullptr) value = *found;
+    if (found == nullptr) continue;
+    value = *found;
+    from = path;
   }
   const Preference& known = *findPreference(domain, key);
   return value && !problemWith(known, *value) ? value : std::nullopt;
@@ -156,16 +163,20 @@ void checkPreferences(const Checkup& checkup, Findings& findings) {
   PreferenceFiles files(checkup, findings);
   files.check(checkup.directories.configuration + "/preferences", false);
   files.check(checkup.directories.state + "/preferences", true);
-  const auto consumers = effective(checkup, StoreMetricon::kPreferenceDomain, StoreMetricon::kConsumersKey);
+  std::string from;
+  const auto consumers =
+      effective(checkup, StoreMetricon::kPreferenceDomain, StoreMetricon::kConsumersKey, from);
   if (!consumers) return;
   const ValueArray& asked = *consumers->asArray();
   const bool isAnythingAsked = std::any_of(asked.begin(), asked.end(), [](const Value& consumer) {
     const Value* events = consumer.asMap()->find("events");
     return events != nullptr && events->asArray() != nullptr && !events->asArray()->empty();
   });
-  if (!isAnythingAsked)
-    findings.add("no-consumer", "consumers of com.orvane.metricon asks for no event",
-                 checkup.twctl() + " defaults delete com.orvane.metricon consumers");
+  if (isAnythingAsked) return;
+  const bool isWritten = from.starts_with(checkup.directories.state + "/");
+  findings.add("no-consumer", "consumers of com.orvane.metricon asks for no event",
+               isWritten ? checkup.twctl() + " defaults delete com.orvane.metricon consumers"
+                         : "edit or remove consumers in " + from);
 }
 
 void checkFacts(const Checkup& checkup, Findings& findings) {
@@ -191,7 +202,9 @@ void checkFacts(const Checkup& checkup, Findings& findings) {
 }
 
 void checkEndpoints(const Checkup& checkup, Findings& findings) {
-  const auto value = effective(checkup, LinuxLinkReport::kPreferenceDomain, LinuxLinkReport::kBackendsKey);
+  std::string from;
+  const auto value =
+      effective(checkup, LinuxLinkReport::kPreferenceDomain, LinuxLinkReport::kBackendsKey, from);
   for (const LinkReportBackends::Endpoint& endpoint : LinkReportBackends::from(value).endpoints) {
     const Address address = addressOf(endpoint.url);
     const std::string problem = checkup.around.reach(address.host, address.port);

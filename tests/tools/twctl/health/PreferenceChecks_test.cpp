@@ -50,7 +50,7 @@ TEST_F(PreferenceChecksTest, FindAKeyThatTheDaemonDoesNotRead) {
                            "'max_days'?"),
                   StartsWith("unknown-key: ")));
   EXPECT_EQ(remedies[1], "twctl defaults delete com.orvane.linkreport device");
-  EXPECT_THAT(remedies[0], StartsWith("rename or remove max_dais in "));
+  EXPECT_THAT(remedies[0], StartsWith("edit or remove max_dais in "));
 }
 
 TEST_F(PreferenceChecksTest, FindAValueThatTheKeyCannotHave) {
@@ -85,6 +85,22 @@ TEST_F(PreferenceChecksTest, FindThatNoEventIsAskedFor) {
   EXPECT_THAT(find(checkPreferences), ElementsAre(StartsWith("no-consumer: ")));
   writeState("com.orvane.metricon", "consumers = [{name = \"a\", events = [\"*\"]}]\n");
   EXPECT_THAT(find(checkPreferences), IsEmpty()) << "what was written counts";
+}
+
+// `defaults delete` removes only what `defaults write` has written.
+TEST_F(PreferenceChecksTest, SendNobodyToDeleteWhatAFileOfTheConfigurationSays) {
+  configure("com.orvane.metricon", "consumers = []\n");
+  configure("com.orvane.linkreport", "backends = [\"ftp://a.example\"]\n");
+  (void)find(checkPreferences);
+  EXPECT_THAT(remedies, ElementsAre(StartsWith("edit or remove backends in "),
+                                    StartsWith("edit or remove consumers in ")));
+  configure("com.orvane.metricon", "");
+  configure("com.orvane.linkreport", "");
+  writeState("com.orvane.metricon", "consumers = []\n");
+  writeState("com.orvane.linkreport", "backends = [\"ftp://a.example\"]\n");
+  (void)find(checkPreferences);
+  EXPECT_THAT(remedies, ElementsAre("twctl defaults delete com.orvane.linkreport backends, or edit the file",
+                                    "twctl defaults delete com.orvane.metricon consumers"));
 }
 
 TEST_F(PreferenceChecksTest, FindFactsThatTheDaemonCannotUse) {
