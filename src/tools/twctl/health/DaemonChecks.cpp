@@ -174,8 +174,11 @@ void checkBridge(const Checkup& checkup, Findings& findings) {
       findings.add("no-bridge", std::string(kBridgeUnit) + " is installed, but does not run");
     return;
   }
-  const std::string directory = checkup.around.environment("XDG_RUNTIME_DIR").value_or("");
+  std::string directory = checkup.around.environment("PIPEWIRE_RUNTIME_DIR").value_or("");
+  if (directory.empty()) directory = checkup.around.environment("XDG_RUNTIME_DIR").value_or("");
   const std::string remote = checkup.around.environment("PIPEWIRE_REMOTE").value_or("pipewire-0");
+  if (directory.empty() && !remote.starts_with('/'))
+    return findings.couldNotSee("PipeWire: XDG_RUNTIME_DIR is not set, so its socket is not known");
   const std::string path = remote.starts_with('/') ? remote : directory + "/" + remote;
   std::error_code error;
   if (!std::filesystem::exists(path, error) && !error)

@@ -126,6 +126,16 @@ TEST_F(DaemonChecksTest, FindABridgeThatIsInstalledAndDoesNotRun) {
   EXPECT_THAT(find(checkBridge), IsEmpty());
 }
 
+// root has no XDG_RUNTIME_DIR in many shells: /pipewire-0 was then missing.
+TEST_F(DaemonChecksTest, SayThatTheyDoNotKnowWherePipeWireIs) {
+  bridges = {{42, checkup.around.user}};
+  environment.erase("XDG_RUNTIME_DIR");
+  EXPECT_THAT(find(checkBridge), IsEmpty());
+  EXPECT_THAT(unseen, ElementsAre("PipeWire: XDG_RUNTIME_DIR is not set, so its socket is not known"));
+  environment["PIPEWIRE_RUNTIME_DIR"] = directory.path("runtime");
+  EXPECT_THAT(find(checkBridge), ElementsAre(StartsWith("no-pipewire: ")));
+}
+
 TEST_F(DaemonChecksTest, FindABridgeWithoutPipeWire) {
   bridges = {{42, checkup.around.user}};
   environment["XDG_RUNTIME_DIR"] = directory.path("runtime");
