@@ -240,7 +240,7 @@ TEST(RedundancyStoryTest, SaysThatNothingRan) {
               [&](const SessionStory& story) { text = story.summaries("Input"); });
   EXPECT_EQ(text,
             "Input summaries: 0. A stretch of input must be longer than 0.5 s.\n"
-            "  none: no message said that input began or ended (session_input_running)\n");
+            "  none: no message said that input began (session_input_running)\n");
 }
 
 TEST(UnknownStoryTest, TellsWhatTheStoreKnowsWithoutTheJournal) {

@@ -14,11 +14,11 @@ Made by the daemon
     load_avg_5_min=0 load_avg_15_min=0
 
 Volume summaries: 0. A stretch of output must be longer than 0.5 s.
-  none: no message said that output began or ended (session_output_running)
+  none: no message said that output began (session_output_running)
 Gather summaries: 0. A stretch of output must be longer than 0.5 s.
-  none: no message said that output began or ended (session_output_running)
+  none: no message said that output began (session_output_running)
 Input summaries: 0. A stretch of input must be longer than 0.5 s.
-  none: no message said that input began or ended (session_input_running)
+  none: no message said that input began (session_input_running)
 
 What was forwarded of it is not known: the store does not record sendings by session.
 --------
@@ -39,11 +39,11 @@ Made by the daemon
     load_avg_5_min=0 load_avg_15_min=0
 
 Volume summaries: 0. A stretch of output must be longer than 0.5 s.
-  none: no message said that output began or ended (session_output_running)
+  none: no message said that output began (session_output_running)
 Gather summaries: 0. A stretch of output must be longer than 0.5 s.
-  none: no message said that output began or ended (session_output_running)
+  none: no message said that output began (session_output_running)
 Input summaries: 0. A stretch of input must be longer than 0.5 s.
-  none: no message said that input began or ended (session_input_running)
+  none: no message said that input began (session_input_running)
 
 Issues
   +0.9 s  LowRMS at speaker (event 5)
@@ -78,7 +78,7 @@ Gather summaries: 0. A stretch of output must be longer than 0.5 s.
     their time
   +17.9 s  a stretch of output began that nothing ended -> no summary: it has no length
 Input summaries: 0. A stretch of input must be longer than 0.5 s.
-  none: no message said that input began or ended (session_input_running)
+  none: no message said that input began (session_input_running)
 
 What was forwarded of it is not known: the store does not record sendings by session.
 --------

@@ -22,7 +22,7 @@ Gather summaries: 0. A stretch of output must be longer than 0.5 s.
     gather_session=1
   until +4 s  output stopped (message 2) -> no summary: no message that counts says when it began
 Input summaries: 0. A stretch of input must be longer than 0.5 s.
-  none: no message said that input began or ended (session_input_running)
+  none: no message said that input began (session_input_running)
 
 What was forwarded of it is not known: the store does not record sendings by session.
 --------
@@ -76,11 +76,11 @@ Made by the daemon
     load_avg_1_min=0 load_avg_5_min=0 load_avg_15_min=0
 
 Volume summaries: 0. A stretch of output must be longer than 0.5 s.
-  none: no message said that output began or ended (session_output_running)
+  none: no message said that output began (session_output_running)
 Gather summaries: 0. A stretch of output must be longer than 0.5 s.
-  none: no message said that output began or ended (session_output_running)
+  none: no message said that output began (session_output_running)
 Input summaries: 0. A stretch of input must be longer than 0.5 s.
-  none: no message said that input began or ended (session_input_running)
+  none: no message said that input began (session_input_running)
 
 What was forwarded of it is not known: the store does not record sendings by session.
 --------

@@ -47,7 +47,7 @@ Gather summaries: 4. A stretch of output must be longer than 0.5 s.
   +34 s to +40 s, 6 s  the client said how long the session was (message 9) -> Gather Summary 4 of
     4, event 4; made of messages 1, 2, 8 and 9
 Input summaries: 0. A stretch of input must be longer than 0.5 s.
-  none: no message said that input began or ended (session_input_running)
+  none: no message said that input began (session_input_running)
 
 What was forwarded of it is not known: the store does not record sendings by session.
 --------

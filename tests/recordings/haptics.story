@@ -15,11 +15,11 @@ Made by the daemon
   7  +9 s  Session_Generic Summary, which the store does not have
 
 Volume summaries: 0. A stretch of output must be longer than 0.5 s.
-  none: no message said that output began or ended (session_output_running)
+  none: no message said that output began (session_output_running)
 Gather summaries: 0. A stretch of output must be longer than 0.5 s.
-  none: no message said that output began or ended (session_output_running)
+  none: no message said that output began (session_output_running)
 Input summaries: 0. A stretch of input must be longer than 0.5 s.
-  none: no message said that input began or ended (session_input_running)
+  none: no message said that input began (session_input_running)
 
 What was forwarded of it is not known: the store does not record sendings by session.
 --------
@@ -34,11 +34,11 @@ Made by the daemon
   2  +2 s  Session_Generic Summary, which the store does not have
 
 Volume summaries: 0. A stretch of output must be longer than 0.5 s.
-  none: no message said that output began or ended (session_output_running)
+  none: no message said that output began (session_output_running)
 Gather summaries: 0. A stretch of output must be longer than 0.5 s.
-  none: no message said that output began or ended (session_output_running)
+  none: no message said that output began (session_output_running)
 Input summaries: 0. A stretch of input must be longer than 0.5 s.
-  none: no message said that input began or ended (session_input_running)
+  none: no message said that input began (session_input_running)
 
 What was forwarded of it is not known: the store does not record sendings by session.
 --------

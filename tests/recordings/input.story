@@ -19,9 +19,9 @@ Made by the daemon
   11  +21 s  Session_Generic Summary, which the store does not have
 
 Volume summaries: 0. A stretch of output must be longer than 0.5 s.
-  none: no message said that output began or ended (session_output_running)
+  none: no message said that output began (session_output_running)
 Gather summaries: 0. A stretch of output must be longer than 0.5 s.
-  none: no message said that output began or ended (session_output_running)
+  none: no message said that output began (session_output_running)
 Input summaries: 2. A stretch of input must be longer than 0.5 s.
   +1 s  input began (message 1)
   +1 s to +11 s, 10 s  active_devices changed from Mic to Headset (message 6) -> Input Summary 1 of

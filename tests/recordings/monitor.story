@@ -26,7 +26,7 @@ Gather summaries: 0. A stretch of output must be longer than 0.5 s.
     gather_session=1
   until +7 s  output stopped (message 6) -> no summary: no message that counts says when it began
 Input summaries: 0. A stretch of input must be longer than 0.5 s.
-  none: no message said that input began or ended (session_input_running)
+  none: no message said that input began (session_input_running)
 
 What was forwarded of it is not known: the store does not record sendings by session.
 --------

@@ -36,7 +36,7 @@ Gather summaries: 0. A stretch of output must be longer than 0.5 s.
   +4.4 s to +5.9 s, 1.5 s  output stopped (message 7) -> no summary: no message before its end said
     whether it was in a Gather session
 Input summaries: 0. A stretch of input must be longer than 0.5 s.
-  none: no message said that input began or ended (session_input_running)
+  none: no message said that input began (session_input_running)
 
 Issues
   +2.9 s  overload (event 5)

@@ -57,7 +57,7 @@ Gather summaries: 0. A stretch of output must be longer than 0.5 s.
     counts says when it began
 Input summaries: 0. A stretch of input must be longer than 0.5 s.
   message 10 was merged into message 9: 0 s after it is less than 2 s
-  none: no message said that input began or ended (session_input_running)
+  none: no message said that input began (session_input_running)
 
 What was forwarded of it is not known: the store does not record sendings by session.
 --------

@@ -244,7 +244,7 @@ TEST_F(JournalRecordingTest, OneSessionTellsItsReasons) {
   EXPECT_THAT(story, HasSubstr("50 s  output stopped (message 4) -> Volume Summary 2 of 2, event "));
   EXPECT_THAT(story, Not(HasSubstr("number=1")));
   EXPECT_THAT(twctl({"explain", "--session", "1", "--missing", "input"}, ownState()),
-              HasSubstr("none: no message said that input began or ended (session_input_running)\n"));
+              HasSubstr("none: no message said that input began (session_input_running)\n"));
   const std::string equal = twctl({"explain", "--json", "--session", "1", "--message", "3"}, ownState());
   EXPECT_THAT(equal, HasSubstr(R"("number":2,)"));
   EXPECT_THAT(equal, HasSubstr(R"("number":3,)"));

@@ -296,7 +296,7 @@ void SessionStory::withheldOrMade(std::string& text, const ReasonedLife::Walk& w
         2 * kIndent);
   } else if (!hasStretch) {
     add(text,
-        std::string(kIndent, ' ') + "none: no message said that " + runs + " began or ended (" +
+        std::string(kIndent, ' ') + "none: no message said that " + runs + " began (" +
             walk.about.text(reasons::kKey) + ")",
         2 * kIndent);
   }
