@@ -256,6 +256,17 @@ TEST_F(JournalRecordingTest, OneSessionTellsItsReasons) {
   EXPECT_THAT(twctl({"session", "2"}, ownState()), HasSubstr("Playback Start: number=1\n"));
 }
 
+TEST_F(JournalRecordingTest, ASessionThatTheJournalNoLongerHasTellsWhatWouldKeepIt) {
+  DaemonClient player = connect();
+  play(player, kSession, kLongFormAudio);
+  ASSERT_EQ(daemon.stop(), 0);
+  for (const auto& segment : std::filesystem::directory_iterator(ownState() + "/journal"))
+    std::filesystem::remove(segment);
+  EXPECT_THAT(twctl({"session", "1"}, ownState()),
+              HasSubstr("The reasons are not known: the journal no longer has its requests, which the "
+                        "preference journal_days of com.orvane.tonewerk.store lets it keep.\n"));
+}
+
 TEST_F(JournalRecordingTest, OneSessionGivesItsReports) {
   constexpr const char* kSummaries = "com.orvane.longformaudio.Volume.Summary";
   {

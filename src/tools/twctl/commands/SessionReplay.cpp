@@ -20,6 +20,10 @@
 namespace tonewerk {
 namespace {
 
+constexpr const char* kGone =
+    "the journal no longer has its requests, which the preference journal_days of com.orvane.tonewerk.store "
+    "lets it keep";
+
 // A directory for the recording and what is made of it, which only this user may read. Goes with everything.
 class PrivateDirectory {
  public:
@@ -66,7 +70,7 @@ std::string record(const Tool& tool, const StoredSession& session, const std::st
   });
   recorder.end();
   if (error) return "the journal cannot be read: " + error.message();
-  if (recorder.requests() == 0) return "the journal no longer has its requests";
+  if (recorder.requests() == 0) return kGone;
   return writer.finish() ? std::string() : "its requests cannot be written to " + file;
 }
 
@@ -97,7 +101,7 @@ ReasonedLife* SessionReplay::play(const Tool& tool, const StoredSession& session
   lives_ = std::move(*lives);
   const ReasonedLife* life = lifeOf(lives_, session);
   if (life == nullptr) {
-    why_ = "the journal no longer has its requests";
+    why_ = kGone;
     return nullptr;
   }
   return &lives_[static_cast<std::size_t>(life - lives_.data())];
