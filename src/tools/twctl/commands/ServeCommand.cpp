@@ -4,7 +4,6 @@
 #include <atomic>
 #include <chrono>
 #include <cstdint>
-#include <fnmatch.h>
 #include <memory>
 #include <optional>
 #include <ostream>
@@ -23,17 +22,16 @@
 #include "tools/twctl/serve/PageServer.h"
 #include "tools/twctl/serve/RequestCheck.h"
 #include "tools/twctl/serve/ServeToken.h"
+#include "tools/twctl/serve/StateSender.h"
 #include "tools/twctl/serve/StoredReport.h"
-#include "values/CompactJson.h"
 
 namespace tonewerk {
 namespace {
 
 using std::chrono::steady_clock;
 
-// How often the store is looked at, and how often a new state is sent at most.
+// How often the store is looked at.
 constexpr std::chrono::milliseconds kTick{500};
-constexpr std::chrono::milliseconds kLeastPause{100};
 
 struct ServeOptions {
   std::uint16_t port = 0;
@@ -77,56 +75,14 @@ StoredReport::Source sourceOf(Tool& tool, const ServeOptions& options, const Val
   return {read, [&tool, &turns] { return stampOf(tool.directories().state) + std::to_string(turns); }};
 }
 
-// Sends the page what has changed.
-class StateSender {
- public:
-  StateSender(LiveFeed& feed, const ReportScope& scope) : feed_(feed), scope_(scope) {}
-
-  void send(const DaemonWatch& daemon, const StoredReport::Reading& stored) {
-    const auto time = steady_clock::now();
-    if (time < sentAt_ + kLeastPause) return;
-    std::string text;
-    appendCompactJson(text, stateOf(daemon, stored));
-    if (text == sent_) return;
-    // The time is no news.
-    const std::string now = std::to_string(secondsSince1970());
-    feed_.publish("{\"now\":" + now + "," + text.substr(1));
-    sent_ = std::move(text);
-    sentAt_ = time;
-  }
-
- private:
-  ValueMap stateOf(const DaemonWatch& daemon, const StoredReport::Reading& stored) const {
-    std::vector<Value> sessions;
-    for (const Value& session : daemon.sessions().toValues()) {
-      if (isInScope(session.asMap()->text("application"))) sessions.push_back(session);
-    }
-    return {{"stored", stored.number},
-            {"storeProblem", stored.problem},
-            {"answers", daemon.answers()},
-            {"problem", daemon.problem()},
-            {"missed", daemon.missed()},
-            {"leftOut", daemon.sessions().leftOut()},
-            {"sessions", ValueArray(std::move(sessions))}};
-  }
-
-  bool isInScope(const std::string& application) const {
-    return !scope_.application ||
-           ::fnmatch(scope_.application->c_str(), application.c_str(), FNM_NOESCAPE) == 0;
-  }
-
-  LiveFeed& feed_;
-  const ReportScope& scope_;
-  std::string sent_;
-  steady_clock::time_point sentAt_;
-};
-
 void follow(DaemonWatch& daemon, StateSender& sender, StoredReport& stored, LiveFeed& feed,
             LiveEvents& events, std::atomic<std::uint64_t>& turns) {
   std::pair<std::uint64_t, std::uint64_t> remembered;
   for (;;) {
     const bool answered = daemon.answers();
-    daemon.proceed(steady_clock::now(), secondsSince1970());
+    const steady_clock::time_point time = steady_clock::now();
+    const double now = secondsSince1970();
+    daemon.proceed(time, now);
     if (daemon.answers() != answered) ++turns;
     // Nobody reads the page, so nobody needs the store's news.
     if (feed.readers() > 0) stored.refresh();
@@ -134,7 +90,7 @@ void follow(DaemonWatch& daemon, StateSender& sender, StoredReport& stored, Live
     const std::pair state(newest->number, daemon.connections());
     if (state != remembered) daemon.remember(newest->running);
     remembered = state;
-    if (daemon.hasAsked()) sender.send(daemon, *newest);
+    if (daemon.hasAsked()) sender.send(daemon, *newest, time, now);
     const auto next = std::min(daemon.nextStep(), steady_clock::now() + kTick);
     if (events.wait(daemon.fileDescriptor(), next) == LiveEvents::Event::kStopped) return;
   }
@@ -165,7 +121,7 @@ int serve(Tool& tool, const ServeOptions& options) {
   tool.out << (tool.asJson ? "{\"address\":\"" + address + "\"}" : address) << '\n';
   if (tool.out.flush()) {
     DaemonWatch daemon(tool.socketPaths());
-    StateSender sender(feed, *scope);
+    StateSender sender(feed, scope->application);
     follow(daemon, sender, stored, feed, events, turns);
   }
   feed.end();

@@ -1,0 +1,43 @@
+// SPDX-License-Identifier: Apache-2.0
+#include "tools/twctl/serve/StateSender.h"
+
+#include <fnmatch.h>
+#include <utility>
+#include <vector>
+
+#include "values/CompactJson.h"
+#include "values/Value.h"
+
+namespace tonewerk {
+
+void StateSender::send(const DaemonWatch& daemon, const StoredReport::Reading& stored, Time time,
+                       double now) {
+  if (sentAt_ && time < *sentAt_ + kLeastPause) return;
+  std::string text;
+  appendCompactJson(text, stateOf(daemon, stored));
+  if (text == sent_) return;
+  feed_.publish("{\"now\":" + std::to_string(now) + "," + text.substr(1));
+  sent_ = std::move(text);
+  sentAt_ = time;
+}
+
+// Without the time, which is no news.
+ValueMap StateSender::stateOf(const DaemonWatch& daemon, const StoredReport::Reading& stored) const {
+  std::vector<Value> sessions;
+  for (const Value& session : daemon.sessions().toValues()) {
+    if (isInScope(session.asMap()->text("application"))) sessions.push_back(session);
+  }
+  return {{"stored", stored.number},
+          {"storeProblem", stored.problem},
+          {"answers", daemon.answers()},
+          {"problem", daemon.problem()},
+          {"missed", daemon.missed()},
+          {"leftOut", daemon.sessions().leftOut()},
+          {"sessions", ValueArray(std::move(sessions))}};
+}
+
+bool StateSender::isInScope(const std::string& application) const {
+  return !application_ || ::fnmatch(application_->c_str(), application.c_str(), FNM_NOESCAPE) == 0;
+}
+
+}  // namespace tonewerk
