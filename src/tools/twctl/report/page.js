@@ -1079,13 +1079,15 @@
   async function takeStored(address) {
     if (asks) return;
     asks = true;
+    let text = null;
     try {
       const answer = await fetch(address, { cache: "no-store" });
-      if (answer.ok) update(parse(await answer.text()));
+      if (answer.ok) text = await answer.text();
     } catch {
       // The next state asks again.
     }
     asks = false;
+    if (text !== null) update(parse(text));
     showTime(true);
   }
 
