@@ -99,6 +99,22 @@ class LivePageTest(unittest.TestCase):
         self.wait_for_stretch("the stretch", lambda one: one["open"] and one["volume"] == 0.6 and one["session"] == "1")
         self.assertEqual(self.browser.problems, [])
 
+    # Nothing changes any more, so nothing new is published: the page takes the time from the server.
+    def test_a_page_that_opens_late_has_the_time_of_now(self):
+        self.machine.start_daemon()
+        self.machine.open_session(706, "org.example.Player", {"session_output_running": True, "QMSessionVolume": 0.6, "active_devices": "Kitchen"})
+        _, address = self.machine.serve()
+        self.open(address)
+        self.wait_for_text("org.example.Player #1: Kitchen at 60 %")
+        first = self.wait_for_stretch("a stretch that grows", lambda one: one["open"])
+        grown = self.wait_for_stretch("its growth", lambda one: one["open"] and one["ended"] > first["ended"] + 2.0)
+        self.open(address)
+        self.wait_for_text("org.example.Player #1: Kitchen at 60 %")
+        late = self.wait_for_stretch("the stretch", lambda one: one["open"])
+        self.assertEqual(late["started"], grown["started"])
+        self.assertGreaterEqual(late["ended"], grown["ended"])
+        self.assertEqual(self.browser.problems, [])
+
     def test_says_when_the_daemon_is_gone_and_goes_on_when_it_is_back(self):
         self.machine.make_store()
         _, address = self.machine.serve()

@@ -112,7 +112,7 @@ int serve(Tool& tool, const ServeOptions& options) {
   problem = server.listen(options.port);
   if (!problem.empty()) return tool.fail(kRefused, "serve: " + problem);
   const RequestCheck check(server.port(), *token);
-  const PageServer pages(check, stored, feed);
+  const PageServer pages(check, stored, feed, secondsSince1970);
   problem = server.start([&pages](const PageRequest& request) { return pages.answer(request); });
   if (!problem.empty()) return tool.fail(kRefused, "serve: " + problem);
   stored.start();

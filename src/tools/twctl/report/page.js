@@ -1033,7 +1033,6 @@
   const liveBox = el("section", { id: "live", "aria-label": "Live" }, liveSays, liveTime, nowList);
   const liveMark = () => [liveBox];
   let serverProblem = NOT_YET;
-  let changed = null;
 
   // Only a change of the connection is read aloud.
   function showState() {
@@ -1043,7 +1042,7 @@
     if (!state) return;
     const missed = state.missed > 0 ? ` ${many(state.missed, "message was", "messages were")} missed.` : "";
     const leftOut = state.leftOut > 0 ? ` ${many(state.leftOut, "more session runs", "more sessions run")}.` : "";
-    const time = `Last change: ${at(changed)}.${missed}${leftOut}`;
+    const time = `Last change: ${at(state.changed)}.${missed}${leftOut}`;
     if (liveTime.textContent !== time) liveTime.textContent = time;
     const { sessions, stretches } = running();
     const open = stretches.filter(({ isOpen }) => isOpen && state.answers && !serverProblem);
@@ -1098,9 +1097,8 @@
       const before = state;
       state = parse(event.data);
       state.came = performance.now();
-      state.lost = state.answers ? null : before?.lost ?? state.now;
+      state.lost = state.answers ? null : before?.lost ?? state.lost;
       serverProblem = "";
-      changed = state.now;
       showTime(true);
       if (state.stored !== data.live.stored) takeStored(`data?token=${token}`);
     });

@@ -15,7 +15,7 @@ namespace tonewerk {
 // nothing is kept for it. Any thread.
 class LiveFeed {
  public:
-  // Replaces the state.
+  // Replaces the state, a JSON object.
   void publish(std::string state);
 
   // Waits until the state is newer than `number`, at most for `patience`, and sets `number` to that of the

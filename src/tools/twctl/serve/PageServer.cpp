@@ -79,12 +79,13 @@ PageAnswer PageServer::live() const {
   PageAnswer answer;
   answer.type = "text/event-stream";
   answer.policy = kNoContent;
-  answer.parts = [&feed = feed_, stream = std::make_shared<Stream>(feed_)]() -> std::string {
+  answer.parts = [&feed = feed_, &now = now_, stream = std::make_shared<Stream>(feed_)]() -> std::string {
     // The head of the answer goes out with its first part.
     if (!std::exchange(stream->hasBegun, true)) return "retry: 1000\n\n";
     const auto state = feed.newerThan(stream->number, std::chrono::seconds(kHeartbeatSeconds));
     if (feed.hasEnded()) return {};
-    return state == nullptr ? ":\n\n" : "data: " + *state + "\n\n";
+    if (state == nullptr) return ":\n\n";
+    return "data: {\"now\":" + std::to_string(now()) + "," + state->substr(1) + "\n\n";
   };
   return answer;
 }

@@ -2,7 +2,9 @@
 #pragma once
 
 #include <cstdint>
+#include <functional>
 #include <string>
+#include <utility>
 
 #include "tools/twctl/serve/HttpServer.h"
 #include "tools/twctl/serve/LiveFeed.h"
@@ -15,15 +17,17 @@ namespace tonewerk {
 //
 //   /      the page, with the stored data
 //   /data  the stored data, as JSON
-//   /live  what runs, as server-sent events: each is the newest state, as JSON
+//   /live  what runs, as server-sent events: each is the newest state, as JSON, with the time in front:
+//          {"now":1700000000.000000,"changed":...}
 class PageServer {
  public:
   // An event stream without news says so little so often, and then finds out that its reader has gone.
   static constexpr int kHeartbeatSeconds = 5;
 
-  // All outlive it.
-  PageServer(const RequestCheck& check, StoredReport& stored, LiveFeed& feed)
-      : check_(check), stored_(stored), feed_(feed) {}
+  // All outlive it. `now` returns the time in seconds since 1970 on any thread. A page that opens long after
+  // the last change needs it.
+  PageServer(const RequestCheck& check, StoredReport& stored, LiveFeed& feed, std::function<double()> now)
+      : check_(check), stored_(stored), feed_(feed), now_(std::move(now)) {}
 
   [[nodiscard]] PageAnswer answer(const PageRequest& request) const;
 
@@ -35,6 +39,7 @@ class PageServer {
   const RequestCheck& check_;
   StoredReport& stored_;
   LiveFeed& feed_;
+  const std::function<double()> now_;
 };
 
 }  // namespace tonewerk

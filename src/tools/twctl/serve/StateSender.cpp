@@ -2,6 +2,7 @@
 #include "tools/twctl/serve/StateSender.h"
 
 #include <fnmatch.h>
+#include <limits>
 #include <utility>
 #include <vector>
 
@@ -12,11 +13,16 @@ namespace tonewerk {
 
 void StateSender::send(const DaemonWatch& daemon, const StoredReport::Reading& stored, Time time,
                        double now) {
+  if (daemon.answers()) {
+    lostAt_.reset();
+  } else if (!lostAt_) {
+    lostAt_ = now;
+  }
   if (sentAt_ && time < *sentAt_ + kLeastPause) return;
   std::string text;
   appendCompactJson(text, stateOf(daemon, stored));
   if (text == sent_) return;
-  feed_.publish("{\"now\":" + std::to_string(now) + "," + text.substr(1));
+  feed_.publish("{\"changed\":" + std::to_string(now) + "," + text.substr(1));
   sent_ = std::move(text);
   sentAt_ = time;
 }
@@ -30,6 +36,7 @@ ValueMap StateSender::stateOf(const DaemonWatch& daemon, const StoredReport::Rea
   return {{"stored", stored.number},
           {"storeProblem", stored.problem},
           {"answers", daemon.answers()},
+          {"lost", lostAt_.value_or(std::numeric_limits<double>::quiet_NaN())},
           {"problem", daemon.problem()},
           {"missed", daemon.missed()},
           {"leftOut", daemon.sessions().leftOut()},

@@ -35,6 +35,7 @@ class StateSender {
   const std::optional<std::string> application_;
   std::string sent_;
   std::optional<Time> sentAt_;
+  std::optional<double> lostAt_;  // since when the daemon does not answer
 };
 
 }  // namespace tonewerk
