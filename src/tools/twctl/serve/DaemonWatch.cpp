@@ -80,7 +80,10 @@ void DaemonWatch::askForMessages() {
 }
 
 void DaemonWatch::askForSessions(std::size_t first) {
-  if (first == 0) listing_.clear();
+  if (first == 0) {
+    listing_.clear();
+    listingFrom_ = time_;
+  }
   if (!askedAt_) askedAt_ = time_;
   ask(requests::kWatchSessions.name, Arguments{Value(first)},
       [this](const Value& result) { takeSessions(result); });
@@ -109,7 +112,8 @@ void DaemonWatch::takeSessions(const Value& result) {
     sessions_.forgetSessions();
     ++connections_;
   }
-  sessions_.list(listing_, now_);
+  // The answer may have come after the step began.
+  sessions_.list(listing_, now_, {listingFrom_, clock_()});
   listing_.clear();
   askedAt_.reset();
   dueAt_ = time_ + kListingPause;

@@ -8,6 +8,7 @@
 #include <optional>
 #include <string>
 #include <system_error>
+#include <utility>
 #include <vector>
 
 #include "tools/twctl/DaemonConnection.h"
@@ -28,8 +29,11 @@ class DaemonWatch {
   // Without an answer for so long, the daemon counts as one that does not answer.
   static constexpr std::chrono::seconds kPatience{5};
 
-  // `paths` are those of the daemon's socket, see Tool::socketPaths().
-  explicit DaemonWatch(std::vector<std::string> paths) : paths_(std::move(paths)) {}
+  // `paths` are those of the daemon's socket, see Tool::socketPaths(). `clock` is the one of the times that
+  // proceed() gets.
+  explicit DaemonWatch(std::vector<std::string> paths,
+                       std::function<Time()> clock = std::chrono::steady_clock::now)
+      : paths_(std::move(paths)), clock_(std::move(clock)) {}
 
   // -1 without a connection.
   int fileDescriptor() const { return connection_ ? connection_->fileDescriptor() : -1; }
@@ -62,6 +66,7 @@ class DaemonWatch {
   void fail(std::string problem, Time time);
 
   const std::vector<std::string> paths_;
+  const std::function<Time()> clock_;
   LiveSessions sessions_;
   bool hasAsked_ = false;
   std::string problem_;
@@ -69,7 +74,8 @@ class DaemonWatch {
   Time time_;                    // of the current step
   double now_ = 0.0;             // likewise, in seconds since 1970
   Time dueAt_;                   // the next connection or listing
-  std::optional<Time> askedAt_;  // when the listing that is awaited was asked for
+  std::optional<Time> askedAt_;  // since when an answer to the listing is awaited
+  Time listingFrom_;             // when its first portion was asked for
   std::error_code failure_;      // of a request of this step
   std::string refusal_;
   bool hasListed_ = false;  // on this connection

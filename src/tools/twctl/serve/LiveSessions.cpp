@@ -12,8 +12,12 @@ namespace tonewerk {
 namespace {
 
 constexpr double kUnknown = std::numeric_limits<double>::quiet_NaN();
-// A session that began later than the listed one by more than this is another one with the same identifier.
+// The store and a listing date a session's start so differently at most.
 constexpr double kSameStart = 2.0;
+// The daemon's seconds are rounded.
+constexpr std::chrono::milliseconds kRounding{1};
+// No device runs longer.
+constexpr double kMostSeconds = 1e9;
 // A client's clock that is wrong by more than this is not believed.
 constexpr double kMostLate = 3600.0;
 constexpr std::string_view kRunning = "session_output_running";
@@ -68,17 +72,21 @@ PlayChange PlayChange::of(const ValueMap& payload, double time) {
   return change;
 }
 
-void LiveSessions::list(const std::vector<ValueMap>& sessions, double now) {
+void LiveSessions::list(const std::vector<ValueMap>& sessions, double now, const Asked& asked) {
   std::vector<Session> listed;
   leftOut_ = 0;
   for (const ValueMap& found : sessions) {
     if (!found.boolean(kWatchKeyStarted) || found.boolean(kWatchKeySingleMessageSession)) continue;
     const std::int64_t process = found.integer(kWatchKeyProcessIdentifier);
     const std::int64_t reporter = found.integer(kWatchKeyReporterID);
-    const double started = now - found.number(kWatchKeySeconds);
+    const double seconds = found.number(kWatchKeySeconds);
+    const auto ran = std::chrono::duration_cast<std::chrono::steady_clock::duration>(
+        std::chrono::duration<double>(std::clamp(seconds, 0.0, kMostSeconds)));
+    // The daemon has counted the seconds after `asked.from` and before `asked.until`. A session that surely
+    // began later than the known one is another one with the same identifier.
     const auto known = std::find_if(sessions_.begin(), sessions_.end(), [&](const Session& one) {
       return !one.ended && one.process == process && one.reporter == reporter &&
-             started - one.started < kSameStart;
+             asked.from - ran <= one.startedBefore + kRounding;
     });
     if (known == sessions_.end() && listed.size() >= kMostSessions) {
       ++leftOut_;
@@ -88,10 +96,12 @@ void LiveSessions::list(const std::vector<ValueMap>& sessions, double now) {
     if (known != sessions_.end()) {
       session = std::move(*known);
       sessions_.erase(known);
+      session.startedBefore = std::min(session.startedBefore, asked.until - ran);
     } else {
       session.process = process;
       session.reporter = reporter;
-      session.started = started;
+      session.started = now - seconds;
+      session.startedBefore = asked.until - ran;
     }
     session.service = found.text(kWatchKeyServiceName);
     session.application = found.text(kWatchKeyApplication);

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <chrono>
 #include <cstddef>
 #include <cstdint>
 #include <deque>
@@ -40,8 +41,14 @@ class LiveSessions {
   // For so long a session is kept after its end, until the store has it.
   static constexpr double kKeptSeconds = 60.0;
 
+  // When a listing was asked for and when it arrived, by a clock that does not jump.
+  struct Asked {
+    std::chrono::steady_clock::time_point from;
+    std::chrono::steady_clock::time_point until;
+  };
+
   // Takes a complete listing of the daemon's sessions. A session that is not in it has ended.
-  void list(const std::vector<ValueMap>& sessions, double now);
+  void list(const std::vector<ValueMap>& sessions, double now, const Asked& asked);
   // Takes a message, one of those in the answer of watch.nextMessages. It is kept until the next listing when
   // its session is not in the last one.
   void take(const ValueMap& message, double now);
@@ -63,7 +70,8 @@ class LiveSessions {
     std::string service;
     std::string application;
     std::string processName;
-    double started = 0.0;
+    double started = 0.0;  // by the clock of the first listing
+    std::chrono::steady_clock::time_point startedBefore;
     std::optional<double> ended;
     PlayChange base;                 // the state before `changes`
     std::deque<PlayChange> changes;  // ordered by time

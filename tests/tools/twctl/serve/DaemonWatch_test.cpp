@@ -39,7 +39,7 @@ class DaemonWatchTest : public testing::Test {
   TemporaryDirectory directory_;
   const std::string path_ = directory_.path("reporting.sock");
   DaemonWatch::Time time_{std::chrono::hours(1)};
-  DaemonWatch watch_{{path_}};
+  DaemonWatch watch_{{path_}, [this] { return time_; }};
 };
 
 TEST_F(DaemonWatchTest, SaysThatNoDaemonAnswersAndTriesAgainLater) {

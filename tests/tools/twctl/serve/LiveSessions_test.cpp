@@ -3,6 +3,7 @@
 
 #include <gmock/gmock.h>
 #include <limits>
+#include <optional>
 
 namespace tonewerk {
 namespace {
@@ -41,6 +42,18 @@ ValueMap stored(std::int64_t reporter, double started, std::initializer_list<Val
 
 class LiveSessionsTest : public testing::Test {
  protected:
+  using Time = std::chrono::steady_clock::time_point;
+
+  // The clock that does not jump is behind by `kBehind`, unless it is given.
+  static constexpr double kBehind = 500.0;
+  void list(const std::vector<ValueMap>& sessions, double now, std::optional<double> monotonic = {},
+            double waited = 0.0) {
+    const auto time = [](double seconds) {
+      return Time(std::chrono::duration_cast<Time::duration>(std::chrono::duration<double>(seconds)));
+    };
+    const double until = monotonic.value_or(now - kBehind);
+    live_.list(sessions, now, {time(until - waited), time(until)});
+  }
   // "100 to 200 at 0.5 on Desk" for each stretch of the session at this place; one that grows has no end.
   std::vector<std::string> stretches(std::size_t place = 0) const {
     const ValueArray all = live_.toValues();
@@ -67,7 +80,7 @@ class LiveSessionsTest : public testing::Test {
 };
 
 TEST_F(LiveSessionsTest, LetsAStretchGrowUntilSomethingChanges) {
-  live_.list({listed(1, 10.0)}, kNow);
+  list({listed(1, 10.0)}, kNow);
   EXPECT_THAT(stretches(), IsEmpty());
   live_.take(message(1, 1001, {{"QMSessionVolume", 0.5}, {"active_devices", "Desk"}}), kNow);
   EXPECT_THAT(stretches(), IsEmpty());
@@ -89,25 +102,47 @@ TEST_F(LiveSessionsTest, LetsAStretchGrowUntilSomethingChanges) {
 TEST_F(LiveSessionsTest, KeepsAMessageUntilItsSessionIsListed) {
   live_.take(message(7, 999, {{"session_output_running", true}, {"QMSessionVolume", 1.0}}), kNow);
   EXPECT_THAT(live_.toValues(), IsEmpty());
-  live_.list({listed(7, 2.0)}, kNow);
+  list({listed(7, 2.0)}, kNow);
   EXPECT_THAT(stretches(), ElementsAre("999 to now at 1 on "));
 }
 
 TEST_F(LiveSessionsTest, EndsWhatIsNoLongerListedAndForgetsItLater) {
-  live_.list({listed(1, 10.0)}, kNow);
+  list({listed(1, 10.0)}, kNow);
   live_.take(message(1, 1001, {{"session_output_running", true}}), kNow);
-  live_.list({}, 1005.0);
+  list({}, 1005.0);
   EXPECT_THAT(stretches(), ElementsAre("1001 to 1005 at ? on "));
-  live_.list({}, 1005.0 + LiveSessions::kKeptSeconds);
+  list({}, 1005.0 + LiveSessions::kKeptSeconds);
   EXPECT_THAT(live_.toValues(), IsEmpty());
 }
 
 TEST_F(LiveSessionsTest, TellsANewSessionWithTheSameIdentifier) {
-  live_.list({listed(1, 10.0)}, kNow);
+  list({listed(1, 10.0)}, kNow);
   live_.take(message(1, 1001, {{"session_output_running", true}}), kNow);
-  live_.list({listed(1, 1.0)}, 1020.0);
+  list({listed(1, 1.0)}, 1020.0);
   EXPECT_THAT(stretches(0), IsEmpty());
   EXPECT_THAT(stretches(1), ElementsAre("1001 to 1020 at ? on "));
+}
+
+// The clock that counts a session's seconds stands still while the machine sleeps.
+TEST_F(LiveSessionsTest, KeepsASessionWhenTheMachineHasSleptOrItsClockIsSet) {
+  list({listed(1, 10.0)}, 1000.0, 500.0);
+  live_.take(message(1, 1001, {{"session_output_running", true}}), 1001.0);
+  list({listed(1, 12.0)}, 4602.0, 502.0);
+  EXPECT_THAT(stretches(), ElementsAre("1001 to now at ? on "));
+  list({listed(1, 13.0)}, 900.0, 503.0);
+  EXPECT_THAT(stretches(), ElementsAre("1001 to now at ? on "));
+  ASSERT_EQ(live_.toValues().size(), 1U);
+  EXPECT_EQ(live_.toValues()[0].asMap()->number("started"), 990.0);
+}
+
+TEST_F(LiveSessionsTest, KeepsASessionWhenAListingComesLate) {
+  list({listed(1, 10.0)}, 1000.0);
+  live_.take(message(1, 1001, {{"session_output_running", true}}), 1001.0);
+  list({listed(1, 11.0)}, 1031.0, 531.0, 30.0);
+  EXPECT_THAT(stretches(), ElementsAre("1001 to now at ? on "));
+  list({listed(1, 42.0)}, 1032.0);
+  EXPECT_THAT(stretches(), ElementsAre("1001 to now at ? on "));
+  EXPECT_EQ(live_.toValues().size(), 1U);
 }
 
 TEST_F(LiveSessionsTest, LeavesOutSessionsThatHaveNotStartedAndTheDaemonsOwn) {
@@ -115,12 +150,12 @@ TEST_F(LiveSessionsTest, LeavesOutSessionsThatHaveNotStartedAndTheDaemonsOwn) {
   waiting.set("started", false);
   ValueMap own = listed(1, 5.0);
   own.set("singleMessageSession", true);
-  live_.list({waiting, own}, kNow);
+  list({waiting, own}, kNow);
   EXPECT_THAT(live_.toValues(), IsEmpty());
 }
 
 TEST_F(LiveSessionsTest, TellsTwoClientsWithTheSameIdentifierByTheirApplications) {
-  live_.list({listed(1, 10.0, "one", 5), listed(1, 10.0, "two", 6)}, kNow);
+  list({listed(1, 10.0, "one", 5), listed(1, 10.0, "two", 6)}, kNow);
   live_.take(message(1, 1001, {{"session_output_running", true}}, "two"), kNow);
   EXPECT_THAT(stretches(0), IsEmpty());
   EXPECT_THAT(stretches(1), ElementsAre("1001 to now at ? on "));
@@ -128,7 +163,7 @@ TEST_F(LiveSessionsTest, TellsTwoClientsWithTheSameIdentifierByTheirApplications
 
 // Each new reading of the store repeats what was said before, and a part of what was watched.
 TEST_F(LiveSessionsTest, RemembersFromTheStoreWhatWasSaidBeforeTheWatchingBegan) {
-  live_.list({listed(1, 100.0)}, kNow);
+  list({listed(1, 100.0)}, kNow);
   live_.take(message(1, 1003, {{"QMSessionVolume", 0.25}}), kNow);
   const ValueMap rows = stored(1, 900.5,
                                {{1003.0, kUnknown, 0.25, kUnknown, kUnknown},
@@ -144,7 +179,7 @@ TEST_F(LiveSessionsTest, RemembersFromTheStoreWhatWasSaidBeforeTheWatchingBegan)
 }
 
 TEST_F(LiveSessionsTest, DoesNotBelieveAClockThatIsFarOff) {
-  live_.list({listed(1, 10.0)}, kNow);
+  list({listed(1, 10.0)}, kNow);
   live_.take(message(1, 5e9, {{"session_output_running", true}, {"QMSessionVolume", 7}}), kNow);
   EXPECT_THAT(stretches(), ElementsAre("1000 to now at 1 on "));
 }
@@ -153,7 +188,7 @@ TEST_F(LiveSessionsTest, KeepsTheNewestChangesAndTheFirstSessions) {
   std::vector<ValueMap> many;
   for (std::size_t i = 0; i < LiveSessions::kMostSessions + 3; ++i)
     many.push_back(listed(static_cast<std::int64_t>(i), 10.0));
-  live_.list(many, kNow);
+  list(many, kNow);
   EXPECT_EQ(live_.toValues().size(), LiveSessions::kMostSessions);
   EXPECT_EQ(live_.leftOut(), 3U);
   live_.take(message(0, 1000, {{"session_output_running", true}}), kNow);
