@@ -187,6 +187,17 @@ class LivePageTest(unittest.TestCase):
                 self.assertEqual(self.browser.problems, [])
         self.assertEqual(self.evaluate("[...document.querySelectorAll('[aria-live], [role=status]')].map((one) => one.className).sort()"), ["live-says", "shows"])
 
+    def test_tells_two_clients_with_the_same_identifier_by_their_applications(self):
+        self.machine.start_daemon()
+        for application in ("org.example.One", "org.example.Two"):
+            self.machine.open_session(707, application, {"session_output_running": True, "QMSessionVolume": 0.5, "active_devices": "Desk"})
+        _, address = self.machine.serve()
+        self.open(address)
+        self.wait_for_text("org.example.One #1: Desk at 50 %")
+        names = "[...document.querySelectorAll('#timeline tbody tr')].map((row) => [...row.cells].slice(0, 2).map((cell) => cell.textContent).join(' ')).sort().join(', ')"
+        self.wait_for(f"{names} === '#1 org.example.One, #2 org.example.Two'", "a row for each")
+        self.assertEqual(self.browser.problems, [])
+
     def test_follows_one_session(self):
         self.machine.start_daemon()
         for reporter, device in ((704, "Desk"), (705, "Kitchen")):

@@ -114,7 +114,7 @@ class Machine:
                  {"call": "startReportingSessionForID", "params": [reporter]}]
         calls += [{"call": "sendMessage", "params": [{**payload, "twreporting_timestamp": {"now": 0}}, 5, 0, [reporter]]} for payload in messages]
         lines = [{"at": 0.0, **call} for call in calls] + [{"at": 36000.0, "call": "stopReportingSessionForID", "params": [reporter]}]
-        file = self.directory / f"session{reporter}.jsonl"
+        file = self.directory / f"session{reporter}-{len(self.processes)}.jsonl"
         file.write_text("".join(json.dumps(line) + "\n" for line in lines))
         client = self.start(f"client{reporter}", PROGRAMS / "twctl", "replay", file)
         wait_until(lambda: str(reporter) in self.run_twctl("list", "--json").stdout, "the session", lambda: self.log(f"client{reporter}"))

@@ -374,11 +374,11 @@ ValueMap sessionFacts(ReportTables& tables) {
 
 ValueMap runningPlayback(ReportTables& tables) {
   return tables.list(
-      "reporter:i started:d at:d running:i volume:d device:t ringer:i",
+      "reporter:i started:d at:d running:i volume:d device:t ringer:i application:t",
       "SELECT s.reporter_id, s.started_at, coalesce(e.payload ->> 'twreporting_timestamp', e.at), e.payload "
       "->> 'session_output_running' AS running, e.payload ->> 'QMSessionVolume' AS volume, e.payload ->> "
-      "'active_devices' AS device, e.payload ->> 'ringerstate' AS ringer FROM (SELECT id, reporter_id, "
-      "started_at FROM shown WHERE ending IS NULL ORDER BY started_at DESC" +
+      "'active_devices' AS device, e.payload ->> 'ringerstate' AS ringer, s.application FROM (SELECT id, "
+      "reporter_id, started_at, application FROM shown WHERE ending IS NULL ORDER BY started_at DESC" +
           limit(ReportData::kMostRunning) +
           ") AS s JOIN main.event AS e ON e.session = s.id WHERE e.source = 'client' AND coalesce(running, "
           "volume, device, ringer) IS NOT NULL ORDER BY e.id DESC" +

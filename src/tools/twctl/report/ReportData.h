@@ -12,7 +12,7 @@ namespace tonewerk {
 struct ReportData {
   ValueMap data;  // for the page; docs/report.md describes what it shows
   // On demand: what the sessions that still run have said of playback, newest first, as a list of rows:
-  // reporter, started (of the session), at, running, volume, device, ringer.
+  // reporter, started (of the session), at, running, volume, device, ringer, application.
   ValueMap running;
   std::string problem;  // empty on success
   bool isUnknownSession = false;

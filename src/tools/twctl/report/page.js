@@ -310,8 +310,11 @@
     const stretches = [];
     if (!state) return { sessions, stretches };
     const stored = rowsOf(data.timeline.lanes);
+    // Clients may use the same identifier at the same time. An application may change its name while its session runs.
+    const fits = (row, one) => row.reporter === one.reporter && row.started !== null && Math.abs(row.started - one.started) < SAME_START;
+    const isOf = (row, one) => fits(row, one) && (row.application ?? "") === one.application;
     for (const one of state.sessions) {
-      const row = stored.find(({ reporter, started }) => reporter === one.reporter && started !== null && Math.abs(started - one.started) < SAME_START);
+      const row = stored.find((each) => isOf(each, one)) ?? stored.find((each) => fits(each, one) && !state.sessions.some((other) => isOf(each, other)));
       if (row && row.ended !== null) continue; // the store has all of it
       if (session && (!row || row.id !== session.id)) continue;
       const id = row ? row.id : `now-${one.reporter}-${Math.round(one.started)}`;

@@ -33,7 +33,7 @@ void merge(PlayChange& state, const PlayChange& change) {
   if (change.ringer) state.ringer = change.ringer;
 }
 
-constexpr std::size_t kStoredCells = 7;
+constexpr std::size_t kStoredCells = 8;
 
 bool isKnown(const Value& cell) { return cell.asDouble() == nullptr || !std::isnan(*cell.asDouble()); }
 
@@ -146,6 +146,10 @@ void LiveSessions::remember(const ValueMap& rows, double watchedSince) {
           std::abs((*cells)[1].number() - session.started) > kSameStart) {
         continue;
       }
+      // The store may not know it yet.
+      const std::string application = isKnown((*cells)[7]) ? (*cells)[7].text() : "";
+      if (!application.empty() && !session.application.empty() && application != session.application)
+        continue;
       PlayChange change = storedChange(*cells);
       if (change.time < watchedSince && said.size() < kMostChanges) said.push_front(std::move(change));
     }
@@ -164,13 +168,14 @@ void LiveSessions::forgetSessions() {
   leftOut_ = 0;
 }
 
-// Two clients may use the same identifier at the same time.
+// Two clients may use the same identifier at the same time. A message without an application belongs to the
+// session with its identifier that came first; one of an application to no session of another one.
 LiveSessions::Session* LiveSessions::find(std::int64_t reporter, const std::string& application) {
   Session* found = nullptr;
   for (Session& session : sessions_) {
     if (session.ended || session.reporter != reporter) continue;
     if (session.application == application) return &session;
-    if (found == nullptr) found = &session;
+    if (found == nullptr && application.empty()) found = &session;
   }
   return found;
 }

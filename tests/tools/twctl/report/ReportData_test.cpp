@@ -440,7 +440,8 @@ TEST_F(ReportDataTest, SaysOnDemandWhatSessionsThatStillRunHaveSaidOfPlayback) {
   EXPECT_TRUE(ReportData::read(directory_.path(), scope, kNow).running.empty());
   scope.hasRunning = true;
   EXPECT_EQ(ReportData::read(directory_.path(), scope, kNow).running.text("rows"),
-            "[[1002,1795132900.0,6.5,1,null,null,null],[1002,1795132900.0,6.0,null,0.25,\"Car\",null]]");
+            "[[1002,1795132900.0,6.5,1,null,null,null,\"Phone\"],"
+            "[1002,1795132900.0,6.0,null,0.25,\"Car\",null,\"Phone\"]]");
 }
 
 }  // namespace

@@ -30,11 +30,13 @@ ValueMap message(std::int64_t reporter, double time, const ValueMap& payload,
   return {{"reporterID", reporter}, {"time", time}, {"application", application}, {"payload", payload}};
 }
 
-ValueMap stored(std::int64_t reporter, double started, std::initializer_list<ValueArray> rows) {
+ValueMap stored(std::int64_t reporter, double started, std::initializer_list<ValueArray> rows,
+                const Value& application = "player") {
   std::vector<Value> list;
   for (const ValueArray& row : rows) {
     std::vector<Value> cells{reporter, started};
     for (const Value& cell : row) cells.push_back(cell);
+    cells.push_back(application);
     list.emplace_back(ValueArray(std::move(cells)));
   }
   return {{"rows", ValueArray(std::move(list))}};
@@ -159,6 +161,28 @@ TEST_F(LiveSessionsTest, TellsTwoClientsWithTheSameIdentifierByTheirApplications
   live_.take(message(1, 1001, {{"session_output_running", true}}, "two"), kNow);
   EXPECT_THAT(stretches(0), IsEmpty());
   EXPECT_THAT(stretches(1), ElementsAre("1001 to now at ? on "));
+}
+
+// The other session is known at the next listing.
+TEST_F(LiveSessionsTest, GivesAMessageToNoSessionOfAnotherApplication) {
+  list({listed(1, 10.0, "one", 5)}, kNow);
+  live_.take(message(1, 1001, {{"session_output_running", true}}, "two"), kNow);
+  EXPECT_THAT(stretches(), IsEmpty());
+  live_.take(message(1, 1002, {{"session_output_running", true}}, ""), kNow);
+  EXPECT_THAT(stretches(), ElementsAre("1002 to now at ? on "));
+  list({listed(1, 11.0, "one", 5), listed(1, 1.0, "two", 6)}, 1001.0);
+  EXPECT_THAT(stretches(0), ElementsAre("1002 to now at ? on "));
+  EXPECT_THAT(stretches(1), ElementsAre("1001 to now at ? on "));
+}
+
+TEST_F(LiveSessionsTest, RemembersOfEachApplicationItsOwn) {
+  list({listed(1, 100.0, "one", 5), listed(1, 100.0, "two", 6)}, kNow);
+  live_.remember(stored(1, 900.0, {{950.0, 1, 0.5, "Desk", kUnknown}}, "two"), kNow);
+  EXPECT_THAT(stretches(0), IsEmpty());
+  EXPECT_THAT(stretches(1), ElementsAre("950 to now at 0.5 on Desk"));
+  // The store does not know the application yet.
+  live_.remember(stored(1, 900.0, {{960.0, 1, 0.25, "Car", kUnknown}}, kUnknown), kNow);
+  EXPECT_THAT(stretches(0), ElementsAre("960 to now at 0.25 on Car"));
 }
 
 // Each new reading of the store repeats what was said before, and a part of what was watched.
