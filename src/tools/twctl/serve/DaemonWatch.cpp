@@ -50,6 +50,7 @@ void DaemonWatch::connect(Time time) {
   askedAt_.reset();
   hasListed_ = false;
   watchedSince_ = now_;
+  sessions_.forgetEarly();
   auto connection = std::make_unique<DaemonConnection>();
   if (connection->connect(paths_)) return fail(kNoAnswer, time);
   connection_ = std::move(connection);

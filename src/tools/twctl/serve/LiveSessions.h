@@ -57,6 +57,9 @@ class LiveSessions {
   void remember(const ValueMap& rows, double watchedSince);
   // Forgets the sessions, because another daemon may have the next ones.
   void forgetSessions();
+  // Forgets the messages that wait for their sessions: another daemon's sessions may have the same
+  // identifiers.
+  void forgetEarly() { early_.clear(); }
 
   // For the page: an array of maps. A stretch that still grows has no end.
   [[nodiscard]] ValueArray toValues() const;

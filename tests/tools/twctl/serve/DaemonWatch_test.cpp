@@ -13,6 +13,7 @@ namespace {
 
 using testing::ElementsAre;
 using testing::HasSubstr;
+using testing::IsEmpty;
 using testing::SizeIs;
 
 constexpr double kNow = 1000.0;
@@ -95,6 +96,27 @@ TEST_F(DaemonWatchTest, KeepsWhatItKnowsWhenTheDaemonGoes) {
   proceedUntil([&] { return !watch_.answers(); });
   EXPECT_EQ(watch_.problem(), "The daemon does not answer; trying again.");
   EXPECT_EQ(sessions(), 1U);
+}
+
+// The next daemon's session with this identifier has not said it.
+TEST_F(DaemonWatchTest, ForgetsAtTheDaemonsEndWhatWaitedForItsSession) {
+  std::optional<ScriptedDaemon> daemon(path_);
+  const ValueMap message{
+      {"reporterID", 7}, {"time", kNow}, {"payload", ValueMap{{"session_output_running", true}}}};
+  daemon->answer("watch.nextMessages", ValueMap{{"missed", 1}, {"messages", ValueArray{message}}});
+  daemon->answer("watch.sessions", listing(1, 1));
+  proceedUntil([&] { return watch_.answers() && watch_.missed() > 0; });
+  const std::int64_t missed = watch_.missed();
+  proceedUntil([&] { return watch_.missed() > missed; });  // after the listing, so that it waits
+  daemon.reset();
+  proceedUntil([&] { return !watch_.answers(); });
+  daemon.emplace(path_);
+  daemon->answer("watch.sessions", listing(1, 7));
+  time_ += DaemonWatch::kRetryPause;
+  proceedUntil([&] { return watch_.answers(); });
+  const ValueArray all = watch_.sessions().toValues();
+  ASSERT_THAT(all, SizeIs(1));
+  EXPECT_THAT(*all[0].asMap()->find("stretches")->asArray(), IsEmpty());
 }
 
 }  // namespace
