@@ -91,7 +91,8 @@ void follow(DaemonWatch& daemon, StateSender& sender, StoredReport& stored, Live
     if (state != remembered) daemon.remember(newest->running);
     remembered = state;
     if (daemon.hasAsked()) sender.send(daemon, *newest, time, now);
-    const auto next = std::min(daemon.nextStep(), steady_clock::now() + kTick);
+    auto next = std::min(daemon.nextStep(), steady_clock::now() + kTick);
+    if (const auto held = sender.heldBackUntil()) next = std::min(next, *held);
     if (events.wait(daemon.fileDescriptor(), next) == LiveEvents::Event::kStopped) return;
   }
 }

@@ -18,13 +18,18 @@ void StateSender::send(const DaemonWatch& daemon, const StoredReport::Reading& s
   } else if (!lostAt_) {
     lostAt_ = now;
   }
-  if (sentAt_ && time < *sentAt_ + kLeastPause) return;
+  if (time < nextTime_) {
+    isHeldBack_ = true;
+    return;
+  }
+  // Also when nothing has changed, because the comparison is the work.
+  nextTime_ = time + kLeastPause;
+  isHeldBack_ = false;
   std::string text;
   appendCompactJson(text, stateOf(daemon, stored));
   if (text == sent_) return;
   feed_.publish("{\"changed\":" + std::to_string(now) + "," + text.substr(1));
   sent_ = std::move(text);
-  sentAt_ = time;
 }
 
 // Without the time, which is no news.

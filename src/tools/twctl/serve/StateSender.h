@@ -23,9 +23,14 @@ class StateSender {
   StateSender(LiveFeed& feed, std::optional<std::string> application)
       : feed_(feed), application_(std::move(application)) {}
 
-  // Does nothing within kLeastPause of a state that was published. `now` is the time in seconds since 1970,
-  // which the state has as that of the change.
+  // Compares the state with the last one and publishes it, at most once in kLeastPause. `now` is the time in
+  // seconds since 1970, which the state has as that of the change.
   void send(const DaemonWatch& daemon, const StoredReport::Reading& stored, Time time, double now);
+
+  // When send() is to be called again, because it came too early; none otherwise.
+  [[nodiscard]] std::optional<Time> heldBackUntil() const {
+    return isHeldBack_ ? std::optional(nextTime_) : std::nullopt;
+  }
 
  private:
   [[nodiscard]] ValueMap stateOf(const DaemonWatch& daemon, const StoredReport::Reading& stored) const;
@@ -34,7 +39,8 @@ class StateSender {
   LiveFeed& feed_;
   const std::optional<std::string> application_;
   std::string sent_;
-  std::optional<Time> sentAt_;
+  Time nextTime_ = Time::min();
+  bool isHeldBack_ = false;
   std::optional<double> lostAt_;  // since when the daemon does not answer
 };
 

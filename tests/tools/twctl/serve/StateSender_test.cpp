@@ -50,6 +50,25 @@ TEST_F(StateSenderTest, PublishesAChangeOnceAndWithItsTime) {
   EXPECT_THAT(published(), StartsWith("{\"changed\":1010.000000,"));
 }
 
+// A message that changes nothing shown would otherwise cost a comparison each time.
+TEST_F(StateSenderTest, LooksAtMostOnceInItsPauseEvenIfNothingHasChanged) {
+  send();
+  EXPECT_NE(published(), "");
+  EXPECT_EQ(sender_.heldBackUntil(), std::nullopt);
+  pass(std::chrono::seconds(5));
+  send();  // nothing has changed
+  const StateSender::Time due = time_ + StateSender::kLeastPause;
+  reading_.number = 2;
+  pass(StateSender::kLeastPause / 2);
+  send();
+  EXPECT_EQ(published(), "");
+  EXPECT_EQ(sender_.heldBackUntil(), due);
+  pass(StateSender::kLeastPause / 2);
+  send();
+  EXPECT_NE(published(), "");
+  EXPECT_EQ(sender_.heldBackUntil(), std::nullopt);
+}
+
 // A page that opens an hour after the daemon's end must not let stretches grow until then.
 TEST_F(StateSenderTest, SaysSinceWhenTheDaemonDoesNotAnswer) {
   std::optional<ScriptedDaemon> daemon(path_);
