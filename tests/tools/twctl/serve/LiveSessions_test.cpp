@@ -202,6 +202,21 @@ TEST_F(LiveSessionsTest, RemembersFromTheStoreWhatWasSaidBeforeTheWatchingBegan)
   EXPECT_EQ(stretches().size(), 3U);
 }
 
+// The changes that there is no room for are merged into the state before the others.
+TEST_F(LiveSessionsTest, KeepsWhatItHasMergedWhenTheStoreIsRead) {
+  list({listed(1, 100.0)}, kNow);
+  live_.take(message(1, 1001, {{"session_output_running", true}, {"active_devices", "Desk"}}), kNow);
+  for (std::size_t i = 0; i < LiveSessions::kMostChanges + 50; ++i) {
+    live_.take(message(1, 1002.0 + static_cast<double>(i), {{"QMSessionVolume", i % 2 == 0 ? 0.5 : 1.0}}),
+               kNow);
+  }
+  const std::vector<std::string> before = stretches();
+  ASSERT_GT(before.size(), 100U);
+  EXPECT_THAT(before.back(), "1251 to now at 1 on Desk");
+  live_.remember(stored(1, 900.0, {{950.0, 1, 0.25, "Car", kUnknown}}), kNow);
+  EXPECT_EQ(stretches(), before);
+}
+
 TEST_F(LiveSessionsTest, DoesNotBelieveAClockThatIsFarOff) {
   list({listed(1, 10.0)}, kNow);
   live_.take(message(1, 5e9, {{"session_output_running", true}, {"QMSessionVolume", 7}}), kNow);
