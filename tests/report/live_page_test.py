@@ -138,6 +138,27 @@ class LivePageTest(unittest.TestCase):
         self.assertLessEqual(next((one["ended"] for one in self.stretches() if one["volume"] == 0.5), 0.0), frozen["ended"] + 0.01)
         self.assertEqual(self.browser.problems, [])
 
+    # The timeline was made anew in between, so it is not the one that the page began with.
+    def test_empties_and_fills_the_timeline_again_with_a_new_store(self):
+        def timeline_has(text):
+            self.wait_for(f"document.querySelector('#timeline').innerText.includes({text!r})", f"{text!r} in the timeline")
+
+        daemon = self.machine.start_daemon()
+        _, address = self.machine.serve()
+        self.open(address)
+        timeline_has("No session was open in this time.")
+        self.machine.open_session(708, "org.example.Player", {"session_output_running": True, "active_devices": "Desk"})
+        timeline_has("org.example.Player")
+        self.machine.stop(daemon)
+        self.wait_for_text("The daemon does not answer; trying again")
+        for file in self.machine.store.parent.glob("reports.db*"):
+            file.unlink()
+        self.machine.start_daemon()
+        timeline_has("No session was open in this time.")
+        self.machine.open_session(709, "org.example.Radio", {"session_output_running": True, "active_devices": "Desk"})
+        timeline_has("org.example.Radio")
+        self.assertEqual(self.browser.problems, [])
+
     def test_keeps_what_its_reader_has_done(self):
         self.machine.make_store()
         self.machine.start_daemon()
