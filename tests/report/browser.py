@@ -114,12 +114,16 @@ class Browser:
         self.call("Emulation.setDeviceMetricsOverride", width=width, height=height, deviceScaleFactor=1, mobile=mobile)
         self.call("Emulation.setTouchEmulationEnabled", enabled=mobile, maxTouchPoints=2)
         self.call("Emulation.setEmulatedMedia", features=[{"name": "prefers-color-scheme", "value": "dark" if dark else "light"}])
-        self.call("Page.navigate", url=address)
+        problem = self.call("Page.navigate", url=address).get("errorText")
+        if problem:
+            raise RuntimeError(f"{address}: {problem}")
         deadline = time.monotonic() + PATIENCE
         scheme = address.split("//", 1)[0]
         while not self.evaluate(f"location.protocol === '{scheme}' && document.readyState === 'complete'"):
             if time.monotonic() > deadline:
-                raise TimeoutError("the page does not load")
+                where = self.evaluate("`${location}, ${document.readyState}, ${document.body?.innerText.length} characters`")
+                raise TimeoutError(f"the page does not load: {where}; {self.requests}")
+            time.sleep(0.05)
 
     def evaluate(self, expression):
         """Returns the value of a JavaScript expression, of a promise when it has one."""
