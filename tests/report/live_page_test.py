@@ -184,6 +184,8 @@ class LivePageTest(unittest.TestCase):
         before = self.evaluate(place)
         self.assertEqual((before["open"], before["top"], before["focus"]), (2, 40, "by-device"))
         self.assertGreater(before["page"], 5)
+        # A summary has only stretches of more than half a second.
+        self.wait_for("document.querySelector('.now').innerText.match(/for (?!1 s)[0-9]/)", "two seconds of playing")
         # The session ends, which gives the stored data another device and another session.
         self.machine.say(702, session_output_running=False)
         self.wait_for_text("Nothing plays now.")
