@@ -114,7 +114,7 @@ class DaemonConnection::Inbox {
 // Owns the library's client.
 class DaemonConnection::Library {
  public:
-  Library(const std::string& path, Inbox& inbox) : inbox_(inbox) {
+  Library(const std::string& path, Inbox& inbox, End end) : inbox_(inbox), end_(end) {
     twr_client_options options{};
     options.size = sizeof(options);
     options.socket_path = path.c_str();
@@ -128,7 +128,10 @@ class DaemonConnection::Library {
   }
   Library(const Library&) = delete;
   Library& operator=(const Library&) = delete;
-  ~Library() { twr_client_destroy(client_, static_cast<int>(kCloseTimeout.count())); }
+  ~Library() {
+    const milliseconds patience = end_ == End::kAtOnce ? milliseconds::zero() : kCloseTimeout;
+    twr_client_destroy(client_, static_cast<int>(patience.count()));
+  }
 
   std::error_code connect() {
     const twr_status status = twr_client_connect(client_, static_cast<int>(kConnectTimeout.count()));
@@ -168,10 +171,11 @@ class DaemonConnection::Library {
   }
 
   Inbox& inbox_;
+  const End end_;
   twr_client* client_ = nullptr;
 };
 
-DaemonConnection::DaemonConnection() = default;
+DaemonConnection::DaemonConnection(End end) : end_(end) {}
 
 DaemonConnection::~DaemonConnection() = default;
 
@@ -186,7 +190,7 @@ std::error_code DaemonConnection::connect(const std::vector<std::string>& paths)
       inbox_.reset();
       return std::make_error_code(std::errc::too_many_files_open);
     }
-    library_ = std::make_unique<Library>(path, *inbox_);
+    library_ = std::make_unique<Library>(path, *inbox_, end_);
     const std::error_code error = library_->connect();
     if (!error) return {};
     if (problem == std::errc::no_such_file_or_directory) problem = error;

@@ -16,7 +16,13 @@ namespace tonewerk {
 // them.
 class DaemonConnection : public RpcClient {
  public:
-  DaemonConnection();
+  // What a connection's end waits for.
+  enum class End {
+    kAnswered,  // that the daemon has answered, for at most 1 s
+    kAtOnce,    // nothing: for those who only read
+  };
+
+  explicit DaemonConnection(End end = End::kAnswered);
   ~DaemonConnection() override;
 
   // Connects to the first path on which a daemon listens. May be called once. The error is that of the first
@@ -33,6 +39,7 @@ class DaemonConnection : public RpcClient {
 
   [[nodiscard]] std::error_code receive(std::chrono::milliseconds timeout) override;
 
+  const End end_;
   std::unique_ptr<Inbox> inbox_;  // outlives the library's client, which puts answers into it
   std::unique_ptr<Library> library_;
 };

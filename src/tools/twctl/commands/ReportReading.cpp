@@ -56,7 +56,12 @@ void ReportScopeOptions::addChoice(CLI::App& command) {
 std::optional<ReportScope> ReportScopeOptions::scope(Tool& tool) const {
   const std::optional<TimeRangeOptions::Range> range = range_.range(tool);
   if (!range) return std::nullopt;
-  return ReportScope{range->since, range->until, application_, session_};
+  ReportScope scope;
+  scope.since = range->since;
+  scope.until = range->until;
+  scope.application = application_;
+  scope.session = session_;
+  return scope;
 }
 
 ValueMap reportedDevice(const Tool& tool) {
@@ -72,7 +77,7 @@ ValueMap reportedDevice(const Tool& tool) {
 ReportData readReport(const Tool& tool, const ReportScope& scope, const ValueMap& device) {
   const double now =
       std::chrono::duration<double>(std::chrono::system_clock::now().time_since_epoch()).count();
-  ValueMap daemon = daemonHealth(tool);
+  ValueMap daemon = daemonHealth(tool, scope.stop);
   ReportScope told = scope;
   told.daemonAnswers = daemon.boolean("answers");
   ReportData report = ReportData::read(tool.directories().state, told, now);

@@ -7,6 +7,7 @@
 #include <memory>
 #include <optional>
 #include <ostream>
+#include <stop_token>
 #include <string>
 #include <sys/stat.h>
 #include <utility>
@@ -62,9 +63,10 @@ std::string stampOf(const std::string& directory) {
 // `turns`: how often the daemon went or came back. A reading asks it how it does.
 StoredReport::Source sourceOf(Tool& tool, const ServeOptions& options, const ValueMap& device,
                               const std::atomic<std::uint64_t>& turns) {
-  const auto read = [&tool, &options, device] {
+  const auto read = [&tool, &options, device](const std::stop_token& stop) {
     std::optional<ReportScope> scope = options.scope.scope(tool);  // again, because a span ends now
     scope->hasRunning = true;
+    scope->stop = stop;
     ReportData report = readReport(tool, *scope, device);
     StoredReport::Reading reading;
     reading.data = std::move(report.data);

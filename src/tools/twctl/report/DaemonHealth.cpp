@@ -18,6 +18,8 @@ namespace {
 
 // A page is made without a daemon, too, so nobody waits long for one.
 constexpr std::chrono::seconds kAnswerTimeout{3};
+// How often it is looked whether somebody still wants the answer.
+constexpr std::chrono::milliseconds kPiece{100};
 
 ValueMap noAnswer(const std::string& reason) { return {{"answers", false}, {"reason", reason}}; }
 
@@ -64,14 +66,31 @@ ValueArray sinksOf(const ValueMap& listing) {
   return ValueArray(std::move(sinks));
 }
 
+// None after kAnswerTimeout or a stop, with the reason in `error`.
+std::optional<Answer> accountsOf(DaemonConnection& daemon, const std::stop_token& stop,
+                                 std::error_code& error) {
+  const auto until = std::chrono::steady_clock::now() + kAnswerTimeout;
+  std::optional<Answer> answer;
+  error = daemon.request(requests::kWatchAccounts.name, {}, [&](const Answer& given) { answer = given; });
+  while (!error && !answer) {
+    if (stop.stop_requested()) {
+      error = std::make_error_code(std::errc::operation_canceled);
+    } else {
+      error = daemon.processAnswers(kPiece);
+      if (error == std::errc::timed_out && std::chrono::steady_clock::now() < until) error.clear();
+    }
+  }
+  return answer;
+}
+
 }  // namespace
 
-ValueMap daemonHealth(const Tool& tool) {
-  DaemonConnection daemon;
+ValueMap daemonHealth(const Tool& tool, const std::stop_token& stop) {
+  DaemonConnection daemon(DaemonConnection::End::kAtOnce);
   std::error_code error = daemon.connect(tool.socketPaths());
   if (error) return noAnswer(error.message());
   (void)daemon.request(requests::kObserve.name, {}, {});  // an older daemon refuses this and works as before
-  const std::optional<Answer> answer = daemon.call(requests::kWatchAccounts.name, {}, kAnswerTimeout, error);
+  const std::optional<Answer> answer = accountsOf(daemon, stop, error);
   if (!answer) return noAnswer(error.message());
   if (answer->error) return noAnswer(DaemonCalls::describe(requests::kWatchAccounts.name, *answer->error));
   const ValueMap* listing = answer->result ? answer->result->asMap() : nullptr;

@@ -3,6 +3,7 @@
 
 #include <cstdint>
 #include <optional>
+#include <stop_token>
 #include <string>
 
 namespace tonewerk {
@@ -14,6 +15,7 @@ struct ReportScope {
   std::optional<std::string> application;  // a pattern with *, ? and [...]
   std::optional<std::int64_t> session;     // the `id` of the view `session`
   bool daemonAnswers = false;              // so a session without an end still runs
+  std::stop_token stop;                    // ends the reading early, which is then a problem
   bool hasRunning = false;                 // also what the sessions that still run have said of playback
 };
 

@@ -106,6 +106,10 @@ bool ReportTables::open(const std::string& directory, double now) {
 
 void ReportTables::each(const std::string& sql, const std::function<void(const SqliteStatement& row)>& take) {
   if (!problem_.empty()) return;
+  if (scope_.stop.stop_requested()) {
+    fail("the reading was stopped");
+    return;
+  }
   SqliteStatement statement = database_.prepare(sql);
   if (scope_.since) statement.bind(1, *scope_.since);
   if (scope_.until) statement.bind(2, *scope_.until);

@@ -51,7 +51,7 @@ void DaemonWatch::connect(Time time) {
   hasListed_ = false;
   watchedSince_ = now_;
   sessions_.forgetEarly();
-  auto connection = std::make_unique<DaemonConnection>();
+  auto connection = std::make_unique<DaemonConnection>(DaemonConnection::End::kAtOnce);
   if (connection->connect(paths_)) return fail(kNoAnswer, time);
   connection_ = std::move(connection);
   (void)connection_->request(requests::kObserve.name, {},

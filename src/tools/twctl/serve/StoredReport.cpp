@@ -7,6 +7,7 @@
 namespace tonewerk {
 
 StoredReport::~StoredReport() {
+  stop_.request_stop();
   {
     const MutexLock lock(mutex_);
     ends_ = true;
@@ -18,7 +19,7 @@ StoredReport::~StoredReport() {
 // The stamp is taken before the reading. A change during the reading is read again.
 std::string StoredReport::readFirst() {
   stamp_ = source_.stamp();
-  auto first = std::make_shared<Reading>(source_.read());
+  auto first = std::make_shared<Reading>(source_.read(stop_.get_token()));
   first->number = 1;
   const MutexLock lock(mutex_);
   newest_ = first;
@@ -61,7 +62,7 @@ void StoredReport::readIfChanged() {
   std::string stamp = source_.stamp();
   // After a problem the files may be back as they were.
   if (stamp == stamp_ && newest()->problem.empty()) return;
-  auto next = std::make_shared<Reading>(source_.read());
+  auto next = std::make_shared<Reading>(source_.read(stop_.get_token()));
   // What failed is tried again.
   if (next->problem.empty()) stamp_ = std::move(stamp);
   const MutexLock lock(mutex_);

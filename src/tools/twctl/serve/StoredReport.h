@@ -5,6 +5,7 @@
 #include <cstdint>
 #include <functional>
 #include <memory>
+#include <stop_token>
 #include <string>
 #include <thread>
 
@@ -25,8 +26,9 @@ class StoredReport {
     std::string problem;       // why the last reading failed; `data` are then older. Empty on success
   };
   struct Source {
-    // Reads the store. A problem is in Reading::problem.
-    std::function<Reading()> read;
+    // Reads the store. A problem is in Reading::problem. When the stop is requested, nobody needs the
+    // reading.
+    std::function<Reading(const std::stop_token& stop)> read;
     // Differs whenever the store has changed.
     std::function<std::string()> stamp;
   };
@@ -64,6 +66,7 @@ class StoredReport {
   std::shared_ptr<const Reading> newest_ GUARDED_BY(mutex_);
   bool isWanted_ GUARDED_BY(mutex_) = false;
   bool ends_ GUARDED_BY(mutex_) = false;
+  std::stop_source stop_;
   std::thread thread_;
 };
 

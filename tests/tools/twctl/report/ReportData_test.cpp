@@ -426,6 +426,15 @@ TEST_F(ReportDataTest, NamesTheFileAndWhatItLacks) {
   EXPECT_THAT(ReportData::read(empty.path(), {}, kNow).problem, HasSubstr("there is no such file"));
 }
 
+TEST_F(ReportDataTest, ReadsNoFurtherWhenItIsStopped) {
+  std::stop_source stop;
+  ReportScope scope;
+  scope.stop = stop.get_token();
+  EXPECT_EQ(ReportData::read(directory_.path(), scope, kNow).problem, "");
+  stop.request_stop();
+  EXPECT_THAT(ReportData::read(directory_.path(), scope, kNow).problem, HasSubstr("the reading was stopped"));
+}
+
 TEST_F(ReportDataTest, SaysOnDemandWhatSessionsThatStillRunHaveSaidOfPlayback) {
   views_.played(1, "Melody", kDay, 60.0, "Speaker", 0.5);
   views_.played(2, "Phone", kDay + 100.0, 60.0, "Earpiece", 0.5);

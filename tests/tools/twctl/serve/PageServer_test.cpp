@@ -23,7 +23,8 @@ class PageServerTest : public testing::Test {
   }
 
   double now_ = 1000.0;
-  StoredReport stored_{{[] { return StoredReport::Reading(); }, [] { return std::string(); }}};
+  StoredReport stored_{
+      {[](const std::stop_token&) { return StoredReport::Reading(); }, [] { return std::string(); }}};
   LiveFeed feed_;
   const RequestCheck check_{kPort, kToken};
   const PageServer pages_{check_, stored_, feed_, [this] { return now_; }};

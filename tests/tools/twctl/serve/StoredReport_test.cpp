@@ -24,8 +24,10 @@ class StoredReportTest : public testing::Test {
   std::atomic<int> content_ = 1;
   std::atomic<int> readings_ = 0;
   std::atomic<bool> isBroken_ = false;
-  StoredReport report_{{[this] {
+  std::atomic<bool> isEndless_ = false;
+  StoredReport report_{{[this](const std::stop_token& stop) {
                           ++readings_;
+                          while (isEndless_ && !stop.stop_requested()) std::this_thread::yield();
                           StoredReport::Reading reading;
                           if (isBroken_) {
                             reading.problem = "broken";
@@ -76,6 +78,16 @@ TEST_F(StoredReportTest, ForgetsAProblemWhenTheFilesAreBackAsTheyWere) {
 TEST_F(StoredReportTest, SaysWhyItCannotBeReadAtFirst) {
   isBroken_ = true;
   EXPECT_EQ(report_.readFirst(), "broken");
+}
+
+// Its end is the end of the test.
+TEST_F(StoredReportTest, DoesNotWaitForAReadingAtItsEnd) {
+  EXPECT_EQ(report_.readFirst(), "");
+  report_.start();
+  isEndless_ = true;
+  content_ = 2;
+  report_.refresh();
+  while (readings_ < 2) std::this_thread::yield();
 }
 
 }  // namespace
