@@ -388,6 +388,17 @@ class PageTest(unittest.TestCase):
         self.show("--days", "1", change=NOTHING + played(1, 0, 3600) + played(2, 3600, 7200))
         self.assertIn("The device played 2 h, ", self.text(".findings"))
 
+    def test_says_each_day_once_and_each_cause_only_when_there_is_one(self):
+        self.show("--days", "1", change=NOTHING + played(1, 0, 3600) + "UPDATE session SET ending = 'disconnected';")
+        self.assertIn("20 Nov 2026, 00:00 to 01:00, by the device's clock", self.text("header"))
+        self.assertIn("1 session ended without a stop: 1 client disconnected.", self.text(".findings"))
+        self.show("--days", "1", change=NOTHING + played(1, 0, 7) + "UPDATE session SET ending = 'interrupted';")
+        self.assertIn("20 Nov 2026, 00:00:00 to 00:00:07, by the device's clock", self.text("header"))
+        self.assertIn("1 session ended without a stop: 1 was interrupted because the daemon or the device ended.", self.text(".findings"))
+        self.show("--days", "1", change=NOTHING + played(1, 0, 90000) + played(2, 0, 7) + "UPDATE session SET ending = 'interrupted' WHERE id = 1; UPDATE session SET ending = 'disconnected' WHERE id = 2;")
+        self.assertIn("20 Nov 2026, 00:00 to 21 Nov 2026, 01:00, by the device's clock", self.text("header"))
+        self.assertIn("2 sessions ended without a stop: 1 client disconnected, 1 was interrupted because the daemon or the device ended.", self.text(".findings"))
+
     def test_says_no_more_than_the_store_knows(self):
         nearly = played(1, 0, 86000) + played(2, 86000, 86100, application="Phone")
         self.show("--days", "1", options=("--app", "M*"), change=NOTHING + nearly + "INSERT INTO issue (at, kind) VALUES (1795132800, 'overload');")

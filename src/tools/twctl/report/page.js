@@ -97,7 +97,12 @@
     });
     return { ticks, tickFormat: (_, i) => texts[i] };
   }
-  const between = (from, until) => `${atMinute(from)} to ${atMinute(until)}`;
+  // The second time is shorter on the same day. Times within a minute have their seconds.
+  function between(from, until) {
+    const text = atMinute(from) === atMinute(until) ? secondText : minuteText;
+    const isSameDay = dayText.format(local(from)) === dayText.format(local(until));
+    return `${text.format(local(from))} to ${text.format(local(until)).split(isSameDay ? ", " : "\0").pop()}`;
+  }
 
   // ---- Elements
 
@@ -255,7 +260,11 @@
     }
     if (totals.hapticsLeaks > 0) said.push(`The haptics engine stayed on without a client: ${many(totals.hapticsLeaks, "time", "times")}, together ${duration(totals.leakedSeconds)}.`);
     const broken = totals.interrupted + totals.disconnected;
-    if (broken > 0 && !session) said.push(`${many(broken, "session", "sessions")} ended without a stop: ${many(totals.disconnected, "client", "clients")} disconnected, ${many(totals.interrupted, "session was", "sessions were")} interrupted because the daemon or the device ended.`);
+    if (broken > 0 && !session) {
+      const causes = [totals.disconnected > 0 ? `${many(totals.disconnected, "client", "clients")} disconnected` : "",
+        totals.interrupted > 0 ? `${many(totals.interrupted, "was", "were")} interrupted because the daemon or the device ended` : ""];
+      said.push(`${many(broken, "session", "sessions")} ended without a stop: ${causes.filter(Boolean).join(", ")}.`);
+    }
     if (data.daemon) said.push(daemonSentence());
     return said;
   }
