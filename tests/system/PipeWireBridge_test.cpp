@@ -78,12 +78,14 @@ class PipeWireBridgeTest : public ::testing::Test {
     });
   }
 
-  // Plays until stopPlaying(). Returns the stream's node, or 0 when it does not run.
-  std::uint32_t play() {
+  // Plays until stopPlaying(). Waits until the bridge has noticed it, for the `times`th time. Returns the
+  // stream's node, or 0 when it does not run.
+  std::uint32_t play(int times = 1) {
     EXPECT_TRUE(
         player.start({kPlayer, {graph.makeTone(60)}, graph.environment()}, path("player"), path("player")));
     std::optional<std::uint32_t> node;
     EXPECT_TRUE(waitUntil([&] { return (node = graph.runningNode(kPlayer)).has_value(); }));
+    EXPECT_TRUE(waitForBridge(R"("session_output_running":true)", times));
     return node.value_or(0);
   }
   void stopPlaying() {
@@ -133,6 +135,7 @@ TEST_F(PipeWireBridgeTest, SummarisesPlaybackByVolume) {
   const std::uint32_t node = play();
   listenFor(milliseconds(1500));
   ASSERT_TRUE(graph.outputOf("wpctl", {"set-volume", std::to_string(node), "0.3"}));
+  ASSERT_TRUE(waitForBridge(R"("QMSessionVolume":0.3)", 1));
   listenFor(milliseconds(1500));
   stopPlaying();
   const std::chrono::duration<double> played = std::chrono::steady_clock::now() - begin;
@@ -255,7 +258,6 @@ TEST_F(PipeWireBridgeTest, ReportsOverloadsOfAStreamThatHangs) {
 
 TEST_F(PipeWireBridgeTest, FollowsPipeWireAndTheDaemonThroughTheirRestarts) {
   play();
-  ASSERT_TRUE(waitForBridge("\"session_output_running\":true", 1));
 
   EXPECT_EQ(daemon.stop(), 0);
   ASSERT_TRUE(daemon.start());
@@ -271,8 +273,7 @@ TEST_F(PipeWireBridgeTest, FollowsPipeWireAndTheDaemonThroughTheirRestarts) {
   ASSERT_TRUE(graph.start());
   ASSERT_TRUE(graph.addSink("headset", "Test Headset"));
   ASSERT_TRUE(waitForBridge("connected to PipeWire", 2));
-  play();
-  ASSERT_TRUE(waitForBridge("\"session_output_running\":true", 3));
+  play(3);
   listenFor(milliseconds(1000));
   stopPlaying();
   ASSERT_TRUE(waitUntil([&] { return summaries().size() == 2; }));
