@@ -4,9 +4,8 @@
 #include <gmock/gmock.h>
 #include <limits>
 #include <optional>
-#include <stdlib.h>
-#include <string>
-#include <time.h>
+
+#include "support/ScopedTimeZone.h"
 
 namespace tonewerk {
 namespace {
@@ -15,20 +14,13 @@ constexpr double kUnknown = std::numeric_limits<double>::quiet_NaN();
 
 class LocalHoursTest : public testing::Test {
  protected:
-  LocalHoursTest() {
-    if (const char* zone = getenv("TZ")) before_ = zone;
-  }
-  void TearDown() override {
-    before_ ? setenv("TZ", before_->c_str(), 1) : unsetenv("TZ");
-    tzset();
-  }
-  static void setZone(const char* zone) {
-    setenv("TZ", zone, 1);
-    tzset();
+  void setZone(const char* zone) {
+    zone_.reset();
+    zone_.emplace(zone);
   }
 
  private:
-  std::optional<std::string> before_;
+  std::optional<ScopedTimeZone> zone_;
 };
 
 TEST_F(LocalHoursTest, DividesAStretchAmongTheHoursOfTheClock) {
