@@ -46,6 +46,14 @@ def rows(hour):
             (3, hour + 70, 3, *phone, "overload", "out", 0.1, 256, 9),
             (4, hour + 80, 3, *phone, "silence", None, 2.0, None, None),
         ],
+        "glitch": [
+            (1, hour + 5, hour + 4.99, f"{int(hour * 1000) + 4990}-7", 2, *player, "late", "late", 0.9, "com.example.player", "player", 4711,
+             "player", "player", "speaker", None, 1.5, 2.7, 128, 48000, 2.7, 1, "player took 4.2 ms of 2.7 ms.", None),
+            (2, hour + 6, hour + 5.99, f"{int(hour * 1000) + 5990}-8", 2, *player, "waiting for another", "late", 0.8, "com.example.filter",
+             "filter", 4712, "filter", "player", "speaker", "filter > player > speaker", 2.0, 2.7, 128, 48000, 2.7, 3,
+             "filter took 4.7 ms of 2.7 ms.", "[]"),
+            (3, hour + 70, None, None, 3, *phone, *(None,) * 15, 1, None, None),
+        ],
         "haptics": [
             (1, hour + 1, "com.example.keyboard", "EngineOnDuration", 0.125, None),
             (2, hour + 2, "com.example.keyboard", "EngineOnDuration", 0.25, None),

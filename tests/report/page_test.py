@@ -37,7 +37,7 @@ CLASHES = """[...document.querySelectorAll('.picture svg')].flatMap((svg) => {
   return found;
 })"""
 
-NOTHING = "".join(f"DELETE FROM {table};" for table in ("session", "event", "volume_stretch", "input_stretch", "gather_stretch", "issue", "haptics", "channel_value", "channel_bucket", "channel_state"))
+NOTHING = "".join(f"DELETE FROM {table};" for table in ("session", "event", "volume_stretch", "input_stretch", "gather_stretch", "issue", "glitch", "haptics", "channel_value", "channel_bucket", "channel_state"))
 
 
 def played(session, begin, end, application="Melody", day=1795132800):

@@ -49,7 +49,46 @@ class ReportViews {
         ", 1 FROM session WHERE id = " + std::to_string(session));
   }
 
+  // What a glitch says; a text is null when it is empty, and a number when it is below 0.
+  struct Glitch {
+    int event = 1;
+    int session = 1;
+    double at = 0.0;
+    std::string id;
+    std::string cause = "late";
+    std::string firstCause = "late";
+    std::string application;  // the culprit's
+    std::string process;
+    std::string node = "filter";  // the culprit's
+    std::string device = "speaker";
+    std::string chain;
+    std::string reason;
+    std::string cycles;
+    double over = 3.0;
+    double lost = 5.0;
+    int overloads = 1;
+  };
+
+  // A glitch of a session that is there.
+  void glitched(const Glitch& glitch) {
+    const auto number = [](double value) { return value < 0.0 ? "NULL" : std::to_string(value); };
+    const std::string at = std::to_string(glitch.at);
+    run("INSERT INTO glitch SELECT " + std::to_string(glitch.event) + ", " + at + ", " + at + ", " +
+        text(glitch.id) + ", id, service, application, " + text(glitch.cause) + ", " +
+        text(glitch.firstCause) + ", 0.9, " + text(glitch.application) + ", " + text(glitch.process) + ", " +
+        (glitch.process.empty() ? "NULL" : "4711") + ", " + text(glitch.node) + ", 'player', " +
+        text(glitch.device) + ", " + text(glitch.chain) + ", " + number(glitch.over) + ", 5.3, 256, 48000, " +
+        number(glitch.lost) + ", " + std::to_string(glitch.overloads) + ", " + text(glitch.reason) + ", " +
+        text(glitch.cycles) + " FROM session WHERE id = " + std::to_string(glitch.session));
+  }
+
  private:
+  static std::string text(const std::string& value) {
+    std::string quoted = "'";
+    for (const char letter : value) quoted.append(letter == '\'' ? 2 : 1, letter);
+    return value.empty() ? "NULL" : quoted + "'";
+  }
+
   SqliteDatabase database_;
 };
 

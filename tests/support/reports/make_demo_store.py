@@ -27,6 +27,7 @@ class Device:
         self.database = sqlite3.connect(path)
         self.database.executescript("PRAGMA journal_mode = OFF; PRAGMA synchronous = OFF;" + schema() + f"PRAGMA user_version = {schema_version()};")
         self.random = random.Random(seed)
+        self.verdicts = random.Random(seed)  # of its own, so that the rest stays as it is
         self.sessions = 0
         self.rows = {}
 
@@ -70,6 +71,7 @@ class Device:
                     self.add("issue", session * 100 + overloads, when, session, service, application, "overload", "mixer", duration, buffer,
                              int(buffer * 1e6 / 48000))
                     self.message(when, session, "HAL_Performance", "IssueDetector")
+                    self.glitch(session * 100 + overloads, when, session, service, application, process, buffer)
             now += seconds
         if input_device:
             self.add("input_stretch", session, session, service, application, at, now, now - at, input_device, "voice",
@@ -87,6 +89,30 @@ class Device:
         if not runs and active > 60:
             self.drivers(session, now, active)
         return now
+
+    def glitch(self, event, at, session, service, application, process, buffer):
+        """The verdict on an overload. Nobody has judged some of them."""
+        period = buffer / 48
+        over = round(min(500.0, self.verdicts.expovariate(1 / 2.5)) + 0.1, 3)
+        kind = self.verdicts.choices(("late", "effect", "hog", "device", "stuck", "unknown", "unjudged"), (40, 22, 14, 9, 5, 4, 6))[0]
+        name = None if kind == "unjudged" else f"{int(at * 1000)}-{int(at * 48000 / buffer) % 1000000}"
+        node, device = process, "alsa_output.usb-interface"
+        own, first, culprit = {
+            "late": ("late", "late", (application, process, 2100, node)),
+            "effect": ("waiting for another", "late", ("Room Equalizer", "equalizer", 1870, "room-eq")),
+            "hog": ("not scheduled", "not scheduled", (None, "backup", 990, node)),
+            "device": ("device", "device", (None, None, None, device)),
+            "stuck": ("stuck", "stuck", ("Soft Synth", "synth", 3001, "synth")),
+        }.get(kind, (None, None, (None, None, None, None)))
+        chain = f"{culprit[3]} > {node} > {device}" if own == "waiting for another" else None
+        reason = None if own is None else f"{culprit[3]} took {period + over:.1f} ms of {period:.1f} ms."
+        begin = [0.0] if culprit[3] is None else [-period * 1000, 0.0, period * 1000]
+        cycles = [{"begin": round(time, 1), "period": round(period * 1000, 1), "nodes": [
+            {"name": one, "process": one, "signal": 10.0, "awake": 15.0 + 50 * i, "finish": round(40.0 + 200 * i + (1000 * (period + over) if time == 0 else 0), 1)}
+            for i, one in enumerate(sorted({culprit[3], node}))]} for time in begin if culprit[3]]
+        self.add("glitch", event, at + 0.002, at, name, session, service, application, own, first, None if name is None else round(self.verdicts.uniform(0.5, 1), 2),
+                 *culprit[:3], culprit[3], node if own else None, device if own else None, chain, over if own else None, period, buffer, 48000,
+                 round(period, 3), self.verdicts.choice((1, 1, 1, 4)), reason, json.dumps(cycles) if cycles else None)
 
     def drivers(self, session, at, active):
         key = (session, at, DRIVER)

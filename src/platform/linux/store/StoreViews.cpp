@@ -110,6 +110,60 @@ std::string issues() {
          " WHERE instr(r.payload, '\"issue_type\":') > 0 AND r.payload ->> 'issue_type' IS NOT NULL";
 }
 
+// A number of a payload; null when it is none, or out of the range.
+std::string numberBetween(std::string_view key, std::string_view sqlType, std::string_view least,
+                          std::string_view most) {
+  const std::string number = entryOf(kOfRow, key, "'integer', 'real'", sqlType);
+  std::string sql = "CASE WHEN (" + number + ") BETWEEN ";
+  sql.append(least).append(" AND ").append(most).append(" THEN ").append(number);
+  return sql.append(" END");
+}
+
+// A cause or a name; null when it is not known.
+std::string glitchText(std::string_view key) {
+  return "nullif(" + knownTextIn(kOfRow, key, "unknown") + ", '')";
+}
+
+// Programs choose the time of a message. A glitch is reported within seconds.
+std::string glitchBegin() {
+  const std::string begin = entryOf(kOfRow, "twreporting_timestamp", "'integer', 'real'", "REAL");
+  return "CASE WHEN (" + begin + ") BETWEEN r.recorded_at - 3600 AND r.recorded_at + 60 THEN " + begin +
+         " END";
+}
+
+// Whoever asks for the parts of the cycles must not fail on a text that is no JSON.
+std::string glitchCycles() {
+  const std::string text = "r.payload ->> 'glitch_cycles'";
+  return "CASE WHEN json_type(r.payload, '$.glitch_cycles') = 'text' THEN CASE WHEN json_valid(" + text +
+         ") THEN CASE WHEN json_type(" + text + ") = 'array' THEN " + text + " END END END";
+}
+
+// Overloads with a verdict, and those without. An overload is looked for by its names, which are few.
+std::string glitches() {
+  constexpr std::string_view kMostMilliseconds = "1e9";
+  constexpr std::string_view kMostNumber = "2147483647";
+  return "SELECT r.id, r.recorded_at, " + glitchBegin() + ", " + glitchText("glitch_id") +
+         ", r.session, nullif(s.service, 'unknown'), " +
+         knownTextIn(kOfRow, "HostApplicationDisplayID", "Unknown") + ", " + glitchText("glitch_cause") +
+         ", " + glitchText("glitch_first_cause") + ", " +
+         numberBetween("glitch_confidence", "REAL", "0", "1") + ", " +
+         glitchText("glitch_culprit_application") + ", " + glitchText("glitch_culprit_process") + ", " +
+         numberBetween("glitch_culprit_pid", "INTEGER", "1", kMostNumber) + ", " +
+         glitchText("glitch_culprit_node") + ", " + glitchText("glitch_node") + ", " +
+         glitchText("glitch_device") + ", " + glitchText("glitch_chain") + ", " +
+         numberBetween("glitch_over_ms", "REAL", "0", kMostMilliseconds) + ", " +
+         numberBetween("glitch_period_ms", "REAL", "0", kMostMilliseconds) + ", " +
+         numberBetween("glitch_quantum", "INTEGER", "1", kMostNumber) + ", " +
+         numberBetween("glitch_rate", "INTEGER", "1", kMostNumber) + ", " +
+         numberBetween("glitch_lost_ms", "REAL", "0", kMostMilliseconds) + ", coalesce(" +
+         numberBetween("xrun_count", "INTEGER", "1", "1000000") + ", 1), " + glitchText("glitch_reason") +
+         ", " + glitchCycles() +
+         " FROM analytics_row AS r LEFT JOIN session_row AS s ON s.id = r.session WHERE r.name_set IN "
+         "(SELECT "
+         "name_set FROM analytics_name WHERE category = 'IO' AND type = 'Error') AND r.payload ->> "
+         "'issue_type' = 'overload'";
+}
+
 std::string haptics() {
   return "SELECT id, recorded_at, " + knownTextIn("payload", "ApplicationName", "Unknown") +
          ", name, coalesce(" + numberIn("payload", "EngineOnDuration") + ", " +
@@ -300,6 +354,39 @@ std::vector<StoreView> makeViews() {
         {"buffer_frames", "integer", "the smallest buffer, in frames"},
         {"io_cycle", "integer", "the cycle's number"}},
        issues()},
+      {"glitch",
+       "an overload in one session, with the verdict on whose it was; sessions that one overload concerns "
+       "share its `glitch_id`",
+       {{"id", "integer", "the `event`"},
+        {"at", "real", "when it was recorded"},
+        {"began_at", "real", "when its cycle of the audio graph began"},
+        {"glitch_id", "text", "the same in each session; null for an overload that nobody has judged"},
+        kSession,
+        kService,
+        kApplication,
+        {"cause", "text",
+         "of the gap in this session: \"late\", \"not scheduled\", \"stuck\", \"waiting for another\", "
+         "\"device\", \"graph changed\" or \"system slept\""},
+        {"first_cause", "text", "of the first in the chain of those who waited, one of the same texts"},
+        {"confidence", "real", "in the verdict, 0 to 1"},
+        {"culprit_application", "text", "the application that caused it"},
+        {"culprit_process", "text", "its process, or the one that held the processor"},
+        {"culprit_pid", "integer", "the number of this process"},
+        {"culprit_node", "text", "the node that was first in the chain"},
+        {"node", "text", "the node through which this session lost its audio"},
+        {"device", "text", "the node that drove the graph"},
+        {"chain", "text", "from the first node to the device, as \"player > filter > sink\""},
+        {"over_ms", "real", "milliseconds beyond the period's end that the culprit took, at least"},
+        {"period_ms", "real", "the time for one cycle, in milliseconds"},
+        {"quantum", "integer", "frames in a cycle"},
+        {"rate", "integer", "in Hz"},
+        {"lost_ms", "real", "how much audio was lost, in milliseconds"},
+        {"overloads", "integer", "so many with the same cause within a second; 1 where nothing is said"},
+        {"reason", "text", "the figures behind the verdict, in a sentence"},
+        {"cycles", "text",
+         "a JSON array of the cycles around it, with times in microseconds since its own cycle began; null "
+         "when the message has another text"}},
+       glitches()},
       {"haptics",
        "a power event of the haptics engine",
        {{"id", "integer", "grows in the order of recording"},

@@ -141,6 +141,97 @@ TEST_F(StoreViewsTest, AnIssueIsAMessageOfAnyTypeThatNamesOne) {
               ElementsAre("overload mixer 2.0 256 12", "5    "));
 }
 
+TEST_F(StoreViewsTest, AGlitchIsAnOverloadWithItsVerdict) {
+  // As long as cycles may be.
+  std::string cycles = R"([{"begin":0,"period":5333.3,"nodes":[{"name":")";
+  constexpr std::size_t kMostCycles = 6 * 1024;
+  cycles.append(kMostCycles - cycles.size() - 6, 'x').append(R"("}]}])");
+  ASSERT_GE(cycles.size(), kMostCycles - 1);
+  write(messageOf(kCategoryIo, kTypeError,
+                  {{"issue_type", "overload"},
+                   {"HostApplicationDisplayID", "org.example.Player"},
+                   {"twreporting_timestamp", 9.5},
+                   {"xrun_count", 3},
+                   {"glitch_id", "9500-47"},
+                   {"glitch_cause", "waiting for another"},
+                   {"glitch_first_cause", "late"},
+                   {"glitch_confidence", 0.75},
+                   {"glitch_culprit_application", "org.example.Studio"},
+                   {"glitch_culprit_process", "studio"},
+                   {"glitch_culprit_pid", 4711},
+                   {"glitch_culprit_node", "filter"},
+                   {"glitch_node", "player"},
+                   {"glitch_device", "speaker"},
+                   {"glitch_chain", "filter > player > speaker"},
+                   {"glitch_over_ms", 3.125},
+                   {"glitch_period_ms", 5},
+                   {"glitch_quantum", 256},
+                   {"glitch_rate", 48000},
+                   {"glitch_lost_ms", 5.5},
+                   {"glitch_reason", "filter took 8.1 ms of 5 ms."},
+                   {"glitch_cycles", cycles}},
+                  EventSource::kClient));
+  EXPECT_THAT(
+      rows("SELECT id, at, began_at, glitch_id, session, application, cause, first_cause, confidence, "
+           "culprit_application, culprit_process, culprit_pid, culprit_node, node, device, chain, "
+           "over_ms, period_ms, quantum, rate, lost_ms, overloads, reason, length(cycles) FROM glitch",
+           24),
+      ElementsAre("1 10.0 9.5 9500-47 1 org.example.Player waiting for another late 0.75 "
+                  "org.example.Studio studio 4711 filter player speaker filter > player > speaker "
+                  "3.125 5.0 256 48000 5.5 3 filter took 8.1 ms of 5 ms. " +
+                  std::to_string(cycles.size())));
+  EXPECT_THAT(rows("SELECT cycles FROM glitch", 1), ElementsAre(cycles));
+}
+
+TEST_F(StoreViewsTest, AnOverloadThatNobodyHasJudgedIsAGlitchWithoutAVerdict) {
+  write(messageOf(kCategoryIo, kTypeError, {{"issue_type", "overload"}}, EventSource::kClient),
+        messageOf(kCategoryIo, kTypeError, {{"issue_type", "silence"}}, EventSource::kClient),
+        messageOf(kCategoryIo, kTypeGeneric, {{"issue_type", "overload"}}, EventSource::kClient),
+        messageOf(kCategoryIo, kTypeError,
+                  {{"issue_type", "overload"}, {"glitch_cause", "unknown"}, {"glitch_culprit_process", ""}},
+                  EventSource::kClient));
+  EXPECT_THAT(rows("SELECT id, overloads, coalesce(glitch_id, cause, first_cause, confidence, "
+                   "culprit_application, culprit_process, culprit_pid, node, over_ms, cycles) FROM glitch",
+                   3),
+              ElementsAre("1 1 ", "4 1 "));
+}
+
+// Any client may send such a message.
+TEST_F(StoreViewsTest, WhatAGlitchCannotSayIsNull) {
+  const ValueMap forged{{"issue_type", "overload"},
+                        {"twreporting_timestamp", 1e12},
+                        {"xrun_count", -5},
+                        {"glitch_id", ValueArray{1}},
+                        {"glitch_cause", true},
+                        {"glitch_confidence", 7},
+                        {"glitch_culprit_application", ValueMap{{"a", 1}}},
+                        {"glitch_culprit_pid", -1},
+                        {"glitch_over_ms", "long"},
+                        {"glitch_period_ms", -1},
+                        {"glitch_quantum", 1e300},
+                        {"glitch_rate", true},
+                        {"glitch_lost_ms", 1e300}};
+  for (const char* cycles : {"[{\"begin\":", "", "{\"begin\":0}", "7", "\xef\xbf\xbd"}) {
+    ValueMap message = forged;
+    message.set("glitch_cycles", cycles);
+    write(messageOf(kCategoryIo, kTypeError, std::move(message), EventSource::kClient));
+  }
+  ValueMap nested = forged;
+  constexpr std::size_t kDepth = 10'000;
+  nested.set("glitch_cycles", std::string(kDepth, '[') + std::string(kDepth, ']'));
+  ValueMap array = forged;
+  array.set("glitch_cycles", ValueArray{1});
+  write(messageOf(kCategoryIo, kTypeError, std::move(nested), EventSource::kClient),
+        messageOf(kCategoryIo, kTypeError, std::move(array), EventSource::kClient));
+  EXPECT_THAT(
+      rows("SELECT count(*), max(overloads) FROM glitch WHERE coalesce(began_at, glitch_id, cause, "
+           "confidence, culprit_application, culprit_pid, over_ms, period_ms, quantum, rate, lost_ms, "
+           "cycles) IS NULL",
+           2),
+      ElementsAre("7 1"));
+  EXPECT_THAT(rows("SELECT count(*) FROM glitch, json_each(cycles)", 1), ElementsAre("0"));
+}
+
 TEST_F(StoreViewsTest, HapticsAreThePowerEventsOfTheirGroup) {
   write(PowerRow{1.0, 28, "on", {{"EngineOnDuration", 3}, {"ApplicationName", "app"}}},
         PowerRow{2.0, 28, "status", {{"Status", true}, {"ApplicationName", "Unknown"}}},
@@ -252,6 +343,17 @@ TEST_F(StoreViewsTest, EveryColumnHasValuesOfItsType) {
                    {"smallest_buffer_frame_size", 256.0},
                    {"io_cycle", 3.0},
                    {"HostApplicationDisplayID", 4}}),
+        messageOf(kCategoryIo, kTypeError,
+                  {{"issue_type", "overload"},
+                   {"xrun_count", 2.0},
+                   {"twreporting_timestamp", 10},
+                   {"glitch_id", 4},
+                   {"glitch_cause", 5},
+                   {"glitch_confidence", 1},
+                   {"glitch_culprit_pid", 3.0},
+                   {"glitch_quantum", 256.0},
+                   {"glitch_over_ms", 3},
+                   {"glitch_cycles", "[]"}}),
         channels(kTypeSimple, {{"Drv_Rx_MCA_Simple_Frames", 1.0}}),
         channels(kTypeHistogram,
                  {{"Drv_Rx_MCA_Histogram_Delay", "count=4,lower=0,upper=30,min=3,max=25,unit=us::0-10:5"}}),
@@ -274,7 +376,11 @@ TEST_F(StoreViewsTest, EveryColumnHasValuesOfItsType) {
   EXPECT_THAT(rows("SELECT mode, input_port, vocoders FROM input_stretch", 3),
               ElementsAre("voice 3 A:16000"));
   EXPECT_THAT(rows("SELECT kind, node, duration_seconds, buffer_frames, io_cycle FROM issue", 5),
-              ElementsAre("1 12 1.0 256 3"));
+              ElementsAre("1 12 1.0 256 3", "overload    "));
+  EXPECT_THAT(rows("SELECT began_at, glitch_id, cause, confidence, culprit_pid, quantum, over_ms, overloads, "
+                   "cycles FROM glitch",
+                   9),
+              ElementsAre("10.0 4 5 1.0 3 256 3.0 2 []"));
 }
 
 TEST_F(StoreViewsTest, AnEmptiedPayloadIsReadAsNothing) {
