@@ -9,10 +9,10 @@
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/health/Checkup.h"
 #include "tools/twctl/health/StoreBound.h"
-#include "tools/twctl/health/WrappedLines.h"
 #include "tools/twctl/show/PagedOutput.h"
 #include "tools/twctl/show/Table.h"
 #include "tools/twctl/show/Terminal.h"
+#include "tools/twctl/show/WrappedLines.h"
 
 namespace tonewerk {
 namespace {

@@ -11,12 +11,12 @@
 #include <utility>
 
 #include "protocol/WatchKeys.h"
-#include "tools/twctl/health/WrappedLines.h"
 #include "tools/twctl/show/AccountTable.h"
 #include "tools/twctl/show/LocalTime.h"
 #include "tools/twctl/show/SinkTable.h"
 #include "tools/twctl/show/Table.h"
 #include "tools/twctl/show/UserName.h"
+#include "tools/twctl/show/WrappedLines.h"
 #include "values/PrintableText.h"
 
 namespace tonewerk {

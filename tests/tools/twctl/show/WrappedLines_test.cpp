@@ -1,5 +1,5 @@
 // SPDX-License-Identifier: Apache-2.0
-#include "tools/twctl/health/WrappedLines.h"
+#include "tools/twctl/show/WrappedLines.h"
 
 #include <gtest/gtest.h>
 #include <sstream>
