@@ -98,6 +98,7 @@ int runCommandLine(int argc, const char* const* argv, Tool& tool) {
   addRtcCommand(app, tool);
   addSessionsCommand(app, tool);
   addSessionCommands(app, tool);
+  addGlitchesCommand(app, tool);
   addTraceCommand(app, tool);
   addReportCommand(app, tool);
   addServeCommand(app, tool);

@@ -30,6 +30,7 @@ void addRtcCommand(CLI::App& app, Tool& tool);
 void addSessionsCommand(CLI::App& app, Tool& tool);
 // Adds session and explain.
 void addSessionCommands(CLI::App& app, Tool& tool);
+void addGlitchesCommand(CLI::App& app, Tool& tool);
 void addTraceCommand(CLI::App& app, Tool& tool);
 void addReportCommand(CLI::App& app, Tool& tool);
 void addServeCommand(CLI::App& app, Tool& tool);
