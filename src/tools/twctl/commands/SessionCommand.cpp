@@ -73,6 +73,16 @@ void printWalk(Tool& tool, const ReasonedLife::Walk& walk) {
   printLine(tool, walk.end);
 }
 
+// With the names of the view `glitch`.
+void addVerdict(ValueMap& line, const GlitchVerdict& verdict) {
+  if (verdict.id) line.set("glitch_id", *verdict.id);
+  if (verdict.cause) line.set("cause", *verdict.cause);
+  if (verdict.firstCause) line.set("first_cause", *verdict.firstCause);
+  line.set("culprit", culpritOf(verdict));
+  if (verdict.overMs) line.set("over_ms", *verdict.overMs);
+  if (verdict.lostMs) line.set("lost_ms", *verdict.lostMs);
+}
+
 // One object a line: the session, then what happened in it, with the keys of the reasons.
 void printObjects(Tool& tool, const KnownSession& known) {
   SessionsTable(tool.out, true, known.session.endedAt.value_or(known.session.startedAt), std::nullopt)
@@ -89,6 +99,7 @@ void printObjects(Tool& tool, const KnownSession& known) {
         {reasons::kWhat, "issue"}, {"event", issue.event}, {reasons::kAt, issue.at}, {"kind", issue.kind}};
     if (issue.node) line.set("node", *issue.node);
     if (issue.seconds) line.set("seconds", *issue.seconds);
+    if (issue.verdict) addVerdict(line, *issue.verdict);
     printLine(tool, line);
   }
 }

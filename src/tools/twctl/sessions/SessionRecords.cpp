@@ -19,6 +19,30 @@ std::string stretchesOf(const std::string& session) {
          session + " ORDER BY 3, 1";
 }
 
+bool hasGlitches(SqlReader& reader) {
+  return !reader.rows("SELECT 1 FROM sqlite_master WHERE name = 'glitch'").empty();
+}
+
+// A store that an earlier daemon has made does not have the view.
+bool readVerdicts(SqlReader& reader, const std::string& session, SessionRecords& records,
+                  std::string& problem) {
+  std::map<std::int64_t, GlitchVerdict> verdicts;
+  if (!hasGlitches(reader)) return true;
+  if (!eachRow(reader,
+               std::string("SELECT ") + GlitchVerdict::columns() + " FROM glitch WHERE session = " + session,
+               {}, problem, [&](const ViewRow& row) {
+                 GlitchVerdict verdict = GlitchVerdict::of(row);
+                 if (verdict.isJudged()) verdicts.emplace(verdict.event, std::move(verdict));
+               })) {
+    return false;
+  }
+  for (SessionRecords::Issue& issue : records.issues) {
+    const auto found = verdicts.find(issue.event);
+    if (found != verdicts.end()) issue.verdict = found->second;
+  }
+  return true;
+}
+
 }  // namespace
 
 std::optional<SessionRecords> readRecords(SqlReader& reader, std::int64_t session, std::string& problem) {
@@ -52,10 +76,12 @@ std::optional<SessionRecords> readRecords(SqlReader& reader, std::int64_t sessio
               "SELECT id, category, payload ->> 'msgidx' FROM event WHERE session = " + id +
                   " AND type = 'Summary' AND category IN ('Volume', 'Input', 'Gather') AND source IS NOT "
                   "'client'",
-              {}, problem, [&](const ViewRow& row) {
+              {}, problem,
+              [&](const ViewRow& row) {
                 const std::pair name(row.text(1).value_or(""), row.integer(2).value_or(0));
                 records.summaries.emplace(name, row.integer(0).value_or(0));
-              });
+              }) &&
+      readVerdicts(reader, id, records, problem);
   return isRead ? std::optional(std::move(records)) : std::nullopt;
 }
 
@@ -72,6 +98,19 @@ std::optional<std::vector<StoredPayload>> readPayloads(SqlReader& reader, std::i
                           row.text(3).value_or(""), row.number(4).value_or(0.0), row.text(5).value_or("")});
       });
   return isRead ? std::optional(std::move(events)) : std::nullopt;
+}
+
+std::optional<std::map<std::int64_t, std::string>> readCycles(SqlReader& reader, std::int64_t session,
+                                                              std::string& problem) {
+  std::map<std::int64_t, std::string> cycles;
+  if (!hasGlitches(reader)) return cycles;
+  const bool isRead = eachRow(
+      reader,
+      "SELECT id, cycles FROM glitch WHERE session = " + std::to_string(session) +
+          " AND length(cycles) <= 65536 ORDER BY id DESC LIMIT " + std::to_string(kMostGlitches),
+      {}, problem,
+      [&](const ViewRow& row) { cycles.emplace(row.integer(0).value_or(0), row.text(1).value_or("")); });
+  return isRead ? std::optional(std::move(cycles)) : std::nullopt;
 }
 
 std::optional<StoredEventRow> readEvent(SqlReader& reader, std::int64_t id, std::string& problem) {

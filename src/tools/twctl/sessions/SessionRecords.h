@@ -8,6 +8,7 @@
 #include <utility>
 #include <vector>
 
+#include "tools/twctl/sessions/GlitchVerdict.h"
 #include "tools/twctl/sql/SqlReader.h"
 
 namespace tonewerk {
@@ -36,6 +37,7 @@ struct SessionRecords {
     std::optional<std::string> node;
     std::optional<double> seconds;
     std::optional<std::int64_t> frames;
+    std::optional<GlitchVerdict> verdict = std::nullopt;  // of an overload, when somebody has judged it
   };
 
   std::vector<Kind> kinds;  // of the events, the most frequent ones first
@@ -48,6 +50,13 @@ struct SessionRecords {
 // None when the store cannot be read; `problem` then says why.
 [[nodiscard]] std::optional<SessionRecords> readRecords(SqlReader& reader, std::int64_t session,
                                                         std::string& problem);
+
+// The cycles around the glitches of a session, as JSON, by their events; of the newest kMostGlitches. None when
+// the store cannot be read; `problem` then says why.
+inline constexpr int kMostGlitches = 1000;
+[[nodiscard]] std::optional<std::map<std::int64_t, std::string>> readCycles(SqlReader& reader,
+                                                                            std::int64_t session,
+                                                                            std::string& problem);
 
 // A row of the view `event`.
 struct StoredEventRow {

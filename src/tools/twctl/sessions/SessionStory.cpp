@@ -17,6 +17,8 @@ namespace {
 // What the core has added to a message, and its time, which the line begins with.
 constexpr std::array<std::string_view, 4> kHidden{"twreporting_timestamp", "audiotag",
                                                   "HostApplicationDisplayID", "invalid_timestamp"};
+// The issues tell the verdict on an overload.
+constexpr std::string_view kHiddenBegin = "glitch_";
 constexpr std::size_t kIndent = 2;
 
 double rounded(double number) {
@@ -67,6 +69,18 @@ std::string messagesText(const ValueArray& numbers) {
 // What a key says that runs: "output" of "session_output_running".
 std::string whatRuns(const ReasonedLife::Walk& walk) {
   return walk.about.text(reasons::kKey).find("input") == std::string::npos ? "output" : "input";
+}
+
+// "cause: late, culprit org.example.Studio (studio, 4711), at least 3.07 ms beyond the deadline, 5.33 ms lost"
+std::string verdictText(const GlitchVerdict& verdict) {
+  if (!verdict.sharedCause()) return "whose it was could not be told";
+  const std::string waiting = "waiting for another";
+  const bool isInnocent = verdict.cause == waiting && verdict.firstCause && verdict.firstCause != waiting;
+  std::string text = isInnocent ? "it waited for another, which was first in the chain: " : "cause: ";
+  text += verdict.causeText() + ", culprit " + culpritOf(verdict);
+  if (verdict.overMs) text += ", at least " + millisecondsText(*verdict.overMs) + " beyond the deadline";
+  if (verdict.lostMs) text += ", " + millisecondsText(*verdict.lostMs) + " lost";
+  return text;
 }
 
 std::string endingText(const StoredSession& session) {
@@ -163,7 +177,9 @@ std::string SessionStory::messageLine(const ValueMap& message) const {
     line += ", event " + message.text(kMessageKeyEvent);
   std::string separator = ":";
   for (const ValueMap::Entry& entry : *map) {
-    if (std::find(kHidden.begin(), kHidden.end(), entry.key.view()) != kHidden.end()) continue;
+    const std::string_view key = entry.key.view();
+    if (std::find(kHidden.begin(), kHidden.end(), key) != kHidden.end() || key.starts_with(kHiddenBegin))
+      continue;
     line += separator + " " + entry.key.string() + "=" + entry.value.text();
     separator.clear();
   }
@@ -311,7 +327,11 @@ void SessionStory::issues(std::string& text) const {
     if (issue.node) line += " at " + *issue.node;
     if (issue.seconds) line += ", " + secondsText(*issue.seconds) + " of silence";
     if (issue.frames) line += ", buffer of " + countOf(*issue.frames, "frame", "frames");
-    add(text, line + " (event " + std::to_string(issue.event) + ")", 2 * kIndent);
+    const std::string event = std::to_string(issue.event);
+    if (issue.verdict) line += "; " + verdictText(*issue.verdict);
+    line += " (event " + event;
+    if (issue.verdict) line += "; `twctl glitches --why " + event + "` tells more";
+    add(text, line + ")", 2 * kIndent);
   }
 }
 
