@@ -1,10 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <CLI/CLI.hpp>
+#include <map>
 #include <memory>
 #include <optional>
 #include <ostream>
 #include <string>
 #include <system_error>
+#include <vector>
 
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/commands/OutputFile.h"
@@ -27,11 +29,15 @@ int trace(Tool& tool, const TraceOptions& options) {
   if (!session) return tool.fail(kRefused, text);
   const std::optional<SessionRecords> records = readRecords(reader, options.session, text);
   if (!records) return tool.fail(kRefused, text);
+  const auto texts = readCycles(reader, options.session, text);
+  if (!texts) return tool.fail(kRefused, text);
+  std::map<std::int64_t, std::vector<GlitchCycle>> cycles;
+  for (const auto& [event, json] : *texts) cycles.emplace(event, GlitchCycles::read(json, tool.json));
   OutputFile file;
   std::error_code error = file.begin(options.file);
   if (error == std::errc::file_exists) return tool.fail(kRefused, options.file + ": it exists already");
   if (error) return tool.fail(kRefused, options.file + ": " + error.message());
-  file.stream() << chromeTrace(*session, *records);
+  file.stream() << chromeTrace(*session, *records, cycles);
   error = file.end();
   return error ? tool.fail(kRefused, options.file + ": " + error.message()) : kDone;
 }
@@ -41,9 +47,9 @@ int trace(Tool& tool, const TraceOptions& options) {
 void addTraceCommand(CLI::App& app, Tool& tool) {
   CLI::App& command = addCommand(app, tool, "trace", "Writes a session as a trace for Perfetto's viewer");
   command.footer(
-      "The file is Chrome trace JSON: playing, recording and devices over time, the volume, and issues, as "
-      "far\n"
-      "as the store has them. Open it at https://ui.perfetto.dev, which keeps it in the browser.");
+      "The file is Chrome trace JSON: playing, recording and devices over time, the volume, issues, and the\n"
+      "cycles around glitches, as far as the store has them. Open it at https://ui.perfetto.dev, which keeps "
+      "it in the browser.");
   const auto options = std::make_shared<TraceOptions>();
   command.add_option("--session", options->session, "The session: the first column of `twctl sessions`")
       ->required()

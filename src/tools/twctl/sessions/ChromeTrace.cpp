@@ -16,6 +16,8 @@ namespace {
 
 constexpr double kMicrosecondsPerSecond = 1e6;
 constexpr std::int64_t kProcess = 1;
+constexpr std::int64_t kGraph = 2;
+constexpr std::int64_t kCycles = 1;  // the first thread of the graph
 
 enum Thread : std::int64_t {
   kSession = 1,
@@ -25,6 +27,7 @@ enum Thread : std::int64_t {
   kOutputDevice,
   kInputDevice,
   kIssues,
+  kGlitches,
 };
 
 struct NamedThread {
@@ -37,7 +40,8 @@ constexpr NamedThread kThreads[] = {{kSession, "session"},
                                     {kGroupSession, "group session"},
                                     {kOutputDevice, "output device"},
                                     {kInputDevice, "input device"},
-                                    {kIssues, "issues"}};
+                                    {kIssues, "issues"},
+                                    {kGlitches, "glitches"}};
 
 Thread threadOf(const SessionRecords::Stretch& stretch) {
   if (stretch.category == "Input") return kRecording;
@@ -46,8 +50,10 @@ Thread threadOf(const SessionRecords::Stretch& stretch) {
 
 class TraceWriter {
  public:
-  TraceWriter(const StoredSession& session, const SessionRecords& records)
-      : session_(session), records_(records) {
+  using Cycles = std::map<std::int64_t, std::vector<GlitchCycle>>;
+
+  TraceWriter(const StoredSession& session, const SessionRecords& records, const Cycles& cycles)
+      : session_(session), records_(records), cycles_(cycles) {
     begin_ = session.startedAt;
     end_ = session.endedAt.value_or(begin_);
     for (const SessionRecords::Stretch& stretch : records.stretches) {
@@ -58,6 +64,9 @@ class TraceWriter {
     for (const SessionRecords::Issue& issue : records.issues) {
       begin_ = std::min(begin_, issue.at);
       if (!session.endedAt) end_ = std::max(end_, issue.at);
+      if (!issue.verdict) continue;
+      begin_ = std::min(begin_, issue.verdict->at);
+      for (const GlitchCycle& cycle : cyclesOf(issue)) begin_ = std::min(begin_, beginOf(issue, cycle));
     }
   }
 
@@ -70,6 +79,7 @@ class TraceWriter {
     addDevices(kInputDevice);
     addVolume();
     for (const SessionRecords::Issue& issue : records_.issues) addIssue(issue);
+    addGlitches();
     return written();
   }
 
@@ -84,11 +94,12 @@ class TraceWriter {
     return std::llround((seconds - begin_) * kMicrosecondsPerSecond);
   }
 
-  void add(ValueMap json, std::string_view phase, std::int64_t at, Thread thread, ValueMap arguments) {
+  void add(ValueMap json, std::string_view phase, std::int64_t at, std::int64_t thread, ValueMap arguments,
+           std::int64_t process = kProcess) {
     json.set("ph", phase);
     json.set("ts", at);
-    json.set("pid", kProcess);
-    json.set("tid", static_cast<std::int64_t>(thread));
+    json.set("pid", process);
+    json.set("tid", thread);
     if (!arguments.empty()) json.set("args", std::move(arguments));
     events_.push_back({at, json.integer("dur"), std::move(json)});
   }
@@ -164,10 +175,88 @@ class TraceWriter {
         std::move(facts));
   }
 
-  void appendName(std::string& text, const char* what, std::int64_t thread, const std::string& name) const {
+  const std::vector<GlitchCycle>& cyclesOf(const SessionRecords::Issue& issue) const {
+    static const std::vector<GlitchCycle> none;
+    const auto found = cycles_.find(issue.event);
+    return found == cycles_.end() ? none : found->second;
+  }
+
+  static double beginOf(const SessionRecords::Issue& issue, const GlitchCycle& cycle) {
+    return issue.verdict->at + cycle.begin / kMicrosecondsPerSecond;
+  }
+
+  void addGlitches() {
+    std::vector<const SessionRecords::Issue*> glitches;
+    for (const SessionRecords::Issue& issue : records_.issues) {
+      if (issue.verdict) glitches.push_back(&issue);
+    }
+    std::stable_sort(glitches.begin(), glitches.end(),
+                     [](const auto* a, const auto* b) { return a->verdict->at < b->verdict->at; });
+    std::map<std::string, double> drawnUntil;  // by device: glitches in a row have cycles in common
+    for (const SessionRecords::Issue* glitch : glitches) {
+      addGlitch(*glitch);
+      double& until =
+          drawnUntil.try_emplace(glitch->verdict->device.value_or(""), begin_ - 1.0).first->second;
+      for (const GlitchCycle& cycle : cyclesOf(*glitch)) {
+        const double begin = beginOf(*glitch, cycle);
+        const double period = cycle.period / kMicrosecondsPerSecond;
+        if (begin + period / 2 < until) continue;
+        addCycle(*glitch, cycle, begin);
+        until = begin + period;
+      }
+    }
+  }
+
+  void addGlitch(const SessionRecords::Issue& issue) {
+    const GlitchVerdict& verdict = *issue.verdict;
+    ValueMap facts{{"event", issue.event}, {"culprit", culpritOf(verdict)}};
+    if (verdict.id) facts.set("glitch_id", *verdict.id);
+    if (verdict.cause) facts.set("cause", *verdict.cause);
+    if (verdict.chain) facts.set("chain", *verdict.chain);
+    if (verdict.overMs) facts.set("over_ms", *verdict.overMs);
+    if (verdict.lostMs) facts.set("lost_ms", *verdict.lostMs);
+    if (verdict.reason) facts.set("reason", *verdict.reason);
+    add({{"name", "glitch: " + verdict.causeText()}, {"cat", "glitch"}, {"s", "t"}}, "i", timeOf(verdict.at),
+        kGlitches, std::move(facts));
+  }
+
+  void addCycle(const SessionRecords::Issue& glitch, const GlitchCycle& cycle, double begin) {
+    const auto slice = [&](const std::string& name, std::int64_t thread, double from, double until,
+                           ValueMap facts) {
+      // Who is late is so in the next cycle, too. Viewers cannot draw slices of one thread that overlap.
+      std::int64_t& busyUntil = busyUntil_.try_emplace(thread, 0).first->second;
+      const std::int64_t at = std::max(busyUntil, timeOf(begin + from / kMicrosecondsPerSecond));
+      const std::int64_t end = timeOf(begin + until / kMicrosecondsPerSecond);
+      if (end <= at) return;
+      busyUntil = end;
+      add({{"name", name}, {"cat", "graph"}, {"dur", end - at}}, "X", at, thread, std::move(facts), kGraph);
+    };
+    ValueMap facts{{"period_us", cycle.period}};
+    if (glitch.verdict->device) facts.set("device", *glitch.verdict->device);
+    slice(cycle.isOfGlitch() ? "the glitch's cycle" : "cycle", kCycles, 0.0, cycle.period, std::move(facts));
+    for (const GlitchCycle::Node& node : cycle.nodes) {
+      const std::int64_t thread = nodeThread(node);
+      // A node that does not answer is shown until the deadline, or for a moment after it.
+      const double unanswered = std::max(cycle.period, node.awake.value_or(node.signal));
+      const double awake = node.awake.value_or(node.finish ? node.signal : unanswered);
+      if (awake > node.signal) slice("waits", thread, node.signal, awake, {});
+      if (!node.awake && !node.finish) continue;
+      const double end = node.finish.value_or(unanswered);
+      slice(node.finish ? "runs" : "runs, no answer", thread, awake, end, {});
+    }
+  }
+
+  std::int64_t nodeThread(const GlitchCycle::Node& node) {
+    const std::string name = node.process.empty() ? node.name : node.name + " (" + node.process + ")";
+    const auto next = kCycles + 1 + static_cast<std::int64_t>(nodeThreads_.size());
+    return nodeThreads_.try_emplace(name, next).first->second;
+  }
+
+  void appendName(std::string& text, const char* what, std::int64_t thread, const std::string& name,
+                  std::int64_t process = kProcess) const {
     appendCompactJson(text, ValueMap{{"name", what},
                                      {"ph", "M"},
-                                     {"pid", kProcess},
+                                     {"pid", process},
                                      {"tid", thread},
                                      {"ts", 0},
                                      {"args", ValueMap{{"name", name}}}});
@@ -189,10 +278,15 @@ class TraceWriter {
                    session_.application.value_or("unknown application"));
     for (const NamedThread& thread : kThreads) {
       const bool isUsed = std::any_of(events_.begin(), events_.end(), [&](const Event& event) {
-        return event.json.integer("tid") == thread.thread;
+        return event.json.integer("pid") == kProcess && event.json.integer("tid") == thread.thread;
       });
       if (isUsed) appendName(text, "thread_name", thread.thread, std::string(thread.name));
     }
+    if (!nodeThreads_.empty()) {
+      appendName(text, "process_name", 0, "audio graph around glitches", kGraph);
+      appendName(text, "thread_name", kCycles, "cycles", kGraph);
+    }
+    for (const auto& [name, thread] : nodeThreads_) appendName(text, "thread_name", thread, name, kGraph);
     for (std::size_t at = 0; at < events_.size(); ++at) {
       appendCompactJson(text, events_[at].json);
       text += at + 1 < events_.size() ? ",\n" : "\n";
@@ -202,6 +296,9 @@ class TraceWriter {
 
   const StoredSession& session_;
   const SessionRecords& records_;
+  const Cycles& cycles_;
+  std::map<std::string, std::int64_t> nodeThreads_;
+  std::map<std::int64_t, std::int64_t> busyUntil_;  // by thread of the graph, in microseconds
   double begin_ = 0.0;
   double end_ = 0.0;
   std::vector<Event> events_;
@@ -209,8 +306,9 @@ class TraceWriter {
 
 }  // namespace
 
-std::string chromeTrace(const StoredSession& session, const SessionRecords& records) {
-  return TraceWriter(session, records).text();
+std::string chromeTrace(const StoredSession& session, const SessionRecords& records,
+                        const std::map<std::int64_t, std::vector<GlitchCycle>>& cycles) {
+  return TraceWriter(session, records, cycles).text();
 }
 
 }  // namespace tonewerk

@@ -1,8 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <cstdint>
+#include <map>
 #include <string>
+#include <vector>
 
+#include "tools/twctl/sessions/GlitchCycles.h"
 #include "tools/twctl/sessions/SessionRecords.h"
 #include "tools/twctl/sessions/StoredSessions.h"
 
@@ -15,9 +19,16 @@ namespace tonewerk {
 //   threads   session, playing, recording, group session: a slice (X) for each stretch
 //             output device, input device: a slice for as long as it was in use
 //             issues: an instant (i) for each
+//             glitches: an instant for each overload that somebody has judged, when its cycle began
 //   counter   volume (C): that of the stretch, 0 while nothing played
 //
-// A session that has not ended goes on until the last time that the store has of it.
-[[nodiscard]] std::string chromeTrace(const StoredSession& session, const SessionRecords& records);
+//   process   the audio graph, where cycles around a glitch are known
+//   threads   cycles: a slice for each, which ends at the deadline
+//             one for each node: slices for as long as it waited and ran
+//
+// A cycle that is near two glitches is there once. A session that has not ended goes on until the last time that the store has of it.
+// `cycles`: those around glitches, by their events.
+[[nodiscard]] std::string chromeTrace(const StoredSession& session, const SessionRecords& records,
+                                      const std::map<std::int64_t, std::vector<GlitchCycle>>& cycles = {});
 
 }  // namespace tonewerk

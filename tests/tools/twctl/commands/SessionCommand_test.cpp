@@ -11,6 +11,7 @@
 namespace tonewerk {
 namespace {
 
+using testing::AllOf;
 using testing::HasSubstr;
 using testing::IsEmpty;
 using testing::StartsWith;
@@ -41,6 +42,39 @@ TEST_F(SessionCommandTest, TellsWhatTheStoreKnowsWithoutAJournal) {
   EXPECT_THAT(output(), HasSubstr("  1  Volume Summary (derived)\n"));
   EXPECT_THAT(output(), HasSubstr("+0 s to +3600 s, 3600 s  Volume on Speaker at volume 0.5 (event 2)\n"));
   EXPECT_THAT(output(), HasSubstr("+10 s  overload at mixer, 0.5 s of silence, buffer of 256 frames"));
+}
+
+TEST_F(SessionCommandTest, TellsWhoseAnOverloadWasAndTheTraceHasItsCycles) {
+  {
+    ReportViews views(directory_.path("glitch.db"));
+    views.played(2, "Melody", 1'795'132'800.0, 3600.0, "Speaker", 0.5);
+    views.overloaded(2, 1'795'132'810.0, 256);
+    views.glitched(
+        {.event = 1,
+         .session = 2,
+         .at = 1'795'132'809.0,
+         .id = "1795132809000-7",
+         .cause = "waiting for another",
+         .application = "Studio",
+         .process = "studio",
+         .cycles = R"([{"begin":0,"period":5000,"nodes":[{"name":"studio","signal":0,"finish":8000}]}])"});
+  }
+  std::filesystem::rename(directory_.path("glitch.db"), directory_.path("state") + "/reports.db");
+  EXPECT_EQ(run({"session", "2"}), kDone) << errors();
+  EXPECT_THAT(
+      output(),
+      HasSubstr("  +10 s  overload at mixer, 0.5 s of silence, buffer of 256 frames; it waited for "
+                "another, which was first in the chain: late, culprit Studio (studio, 4711), at least "
+                "3 ms beyond the deadline, 5 ms lost (event 1; `twctl glitches --why 1` tells more)\n"));
+  EXPECT_EQ(run({"session", "2", "--json"}), kDone) << errors();
+  EXPECT_THAT(output(),
+              HasSubstr(R"("seconds":0.5,"glitch_id":"1795132809000-7","cause":"waiting for another",)"
+                        R"x("first_cause":"late","culprit":"Studio (studio, 4711)","over_ms":3.0,)x"));
+  const std::string trace = directory_.path("trace.json");
+  EXPECT_EQ(run({"trace", "--session", "2", "-o", trace}), kDone) << errors();
+  std::string text;
+  ASSERT_FALSE(readTextFile(trace, text));
+  EXPECT_THAT(text, AllOf(HasSubstr("\"the glitch's cycle\""), HasSubstr("\"glitch: late\"")));
 }
 
 TEST_F(SessionCommandTest, GivesProgramsAnObjectALine) {

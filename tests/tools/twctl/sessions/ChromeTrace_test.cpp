@@ -4,6 +4,7 @@
 #include <gmock/gmock.h>
 #include <map>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "platform/linux/json/NlohmannJsonService.h"
@@ -33,10 +34,24 @@ class ChromeTraceTest : public testing::Test {
                                   kBegin + from, kBegin + until, until - from, device, volume});
   }
 
+  // A glitch whose node "studio" took 8 ms of 5 ms, and the cycle after it. "player" did not wake in time.
+  void glitched(std::int64_t event, double at) {
+    GlitchVerdict verdict;
+    verdict.event = event;
+    verdict.at = kBegin + at;
+    verdict.id = "1-1";
+    verdict.cause = "late";
+    verdict.culpritApplication = "Studio";
+    verdict.reason = "studio took 8 ms of 5 ms.";
+    records_.issues.push_back({event, kBegin + at + 0.5, "overload", {}, {}, 256, verdict});
+    cycles_[event] = {
+        {0.0, 5000.0, {{"studio", "studio", 10.0, 20.0, 8000.0}, {"player", "", 8000.0, {}, {}}}},
+        {5000.0, 5000.0, {{"studio", "studio", 10.0, 20.0, 3500.0}, {"player", "", 3500.0, 3510.0, 4000.0}}}};
+  }
   ValueMap trace() const {
     const NlohmannJsonService json;
     std::string problem;
-    const auto value = json.parse(chromeTrace(session_, records_), problem);
+    const auto value = json.parse(chromeTrace(session_, records_, cycles_), problem);
     EXPECT_TRUE(value) << problem;
     return value && value->asMap() != nullptr ? *value->asMap() : ValueMap();
   }
@@ -63,14 +78,17 @@ class ChromeTraceTest : public testing::Test {
                          .endedAt = kBegin + 21.0,
                          .ending = "stopped"};
   SessionRecords records_;
+  std::map<std::int64_t, std::vector<GlitchCycle>> cycles_;
 };
 
 // The rules of the format: which fields each phase needs, and what viewers expect of them.
 TEST_F(ChromeTraceTest, KeepsTheRulesOfTheFormat) {
+  glitched(6, 2.0);
+  glitched(7, 2.005);
   const ValueMap all = trace();
   double last = 0.0;
-  std::map<std::int64_t, double> busyUntil;  // by thread
-  std::map<std::int64_t, std::string> threads;
+  std::map<std::pair<std::int64_t, std::int64_t>, double> busyUntil;  // by process and thread
+  std::map<std::pair<std::int64_t, std::int64_t>, std::string> threads;
   for (const Value& value : *all.find("traceEvents")->asArray()) {
     ASSERT_NE(value.asMap(), nullptr);
     const ValueMap& event = *value.asMap();
@@ -80,7 +98,7 @@ TEST_F(ChromeTraceTest, KeepsTheRulesOfTheFormat) {
     const double at = event.number("ts");
     EXPECT_GE(at, last) << "not sorted";
     last = at;
-    const std::int64_t thread = event.integer("tid");
+    const std::pair thread(event.integer("pid"), event.integer("tid"));
     if (phase == "M") {
       ASSERT_TRUE(event.contains("args"));
       EXPECT_NE(event.find("args")->asMap()->text("name"), "");
@@ -97,7 +115,7 @@ TEST_F(ChromeTraceTest, KeepsTheRulesOfTheFormat) {
     if (phase == "i") EXPECT_EQ(event.text("s"), "t");
     if (phase == "C") EXPECT_NE(event.find("args")->asMap()->find("volume")->asDouble(), nullptr);
   }
-  EXPECT_EQ(threads.at(0), "session 41: org.example.\"Player\"\n");
+  EXPECT_EQ(threads.at({1, 0}), "session 41: org.example.\"Player\"\n");
 }
 
 TEST_F(ChromeTraceTest, HasASliceForEachStretchAndDevice) {
@@ -110,6 +128,32 @@ TEST_F(ChromeTraceTest, HasASliceForEachStretchAndDevice) {
 TEST_F(ChromeTraceTest, CountsTheVolumeWhichIsNothingWhileNothingPlays) {
   EXPECT_THAT(events("C"), ElementsAre("volume 0 =0.5", "volume 3000000 =0.25", "volume 10000000 =0",
                                        "volume 12000000 =0.75", "volume 20000000 =0"));
+}
+
+TEST_F(ChromeTraceTest, HasTheCyclesAroundAGlitchAsSlicesOnATrackForEachNode) {
+  records_ = {};
+  glitched(6, 2.0);
+  EXPECT_THAT(events("X"), ElementsAre("longformaudio 0+21000000", "the glitch's cycle 2000000+5000",
+                                       "waits 2000010+10", "runs 2000020+7980", "cycle 2005000+5000",
+                                       "runs 2008000+500", "waits 2008500+10", "runs 2008510+490"));
+  EXPECT_THAT(events("i"), ElementsAre("glitch: late 2000000", "overload 2500000"));
+  const std::string text = chromeTrace(session_, records_, cycles_);
+  EXPECT_THAT(text, HasSubstr(R"x("name":"studio (studio)")x"));
+  EXPECT_THAT(text, HasSubstr(R"("name":"player")"));
+  EXPECT_THAT(text, HasSubstr("studio took 8 ms of 5 ms."));
+}
+
+TEST_F(ChromeTraceTest, HasACycleNearTwoGlitchesOnce) {
+  records_ = {};
+  glitched(6, 2.0);
+  glitched(7, 2.005001);  // the clock of the second message was read a little later
+  std::vector<std::string> cycles;
+  for (const std::string& slice : events("X")) {
+    if (slice.find("cycle") != std::string::npos) cycles.push_back(slice);
+  }
+  EXPECT_THAT(cycles,
+              ElementsAre("the glitch's cycle 2000000+5000", "cycle 2005000+5000", "cycle 2010001+5000"));
+  EXPECT_THAT(events("i"), testing::Contains("glitch: late 2005001"));
 }
 
 TEST_F(ChromeTraceTest, MarksIssues) { EXPECT_THAT(events("i"), ElementsAre("overload 2500000")); }
