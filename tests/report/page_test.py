@@ -130,6 +130,46 @@ class PageTest(unittest.TestCase):
             place = scale["left"] + (float(mark["at"]) - scale["from"]) / (scale["until"] - scale["from"]) * (scale["right"] - scale["left"])
             self.assertAlmostEqual(mark["_x1"], place, delta=0.2)
 
+    def test_puts_glitches_at_their_times_with_whose_they_were(self):
+        page = self.show(change="UPDATE glitch SET glitch_id = (SELECT glitch_id FROM glitch WHERE culprit_application = 'Soft Synth' ORDER BY id LIMIT 1) WHERE culprit_application = 'Soft Synth'")
+        scale = {key: float(value) for key, value in self.browser.evaluate(SCALE).items()}
+        marks = self.marks("glitch")
+        expected = page.query("""SELECT min(began_at), coalesce(culprit_application, CASE first_cause WHEN 'device' THEN 'the device' END, culprit_process, 'not known'),
+            coalesce(first_cause, 'not known') FROM glitch GROUP BY coalesce(glitch_id, id) ORDER BY 1""")
+        found = sorted((float(mark["at"]), mark["culprit"], mark["cause"]) for mark in marks)
+        self.assertEqual([row[1:] for row in found], [row[1:] for row in expected])
+        for (at, _, _), (right, _, _) in zip(found, expected):
+            self.assertAlmostEqual(at, right, delta=0.001)
+        self.assertEqual(sum(culprit == "Soft Synth" for _, culprit, _ in expected), 1)  # many sessions heard it
+        self.assertGreater(len(expected), 50)
+        for mark in marks:
+            place = scale["left"] + (float(mark["at"]) - scale["from"]) / (scale["until"] - scale["from"]) * (scale["right"] - scale["left"])
+            self.assertAlmostEqual(mark["_x1"], place, delta=0.2)
+        self.assertIn("Glitches, and whose they were", self.browser.evaluate("document.querySelector('#timeline svg').textContent"))
+        titles = self.browser.evaluate("[...document.querySelectorAll('[data-mark=glitch] title')].map((title) => title.textContent)")
+        self.assertTrue(any(re.match(r"backup: not scheduled at .*, [0-9.]+ ms beyond the deadline, [0-9.]+ ms lost(, 4 times within a second)?; heard by Pocket Studio$", title) for title in titles))
+
+    def test_ranks_who_caused_how_many_glitches(self):
+        page = self.show()
+        expected = page.query("""SELECT coalesce(culprit_application, CASE first_cause WHEN 'device' THEN 'the device' END, culprit_process, 'not known') AS who, sum(overloads)
+            FROM glitch GROUP BY who ORDER BY 2 DESC, sum(lost_ms) DESC""")
+        bars = self.browser.evaluate("[...document.querySelectorAll('#culprits [data-mark=bar]')].map((bar) => [bar.dataset.name, Number(bar.dataset.seconds), Number(bar.getAttribute('width'))])")
+        self.assertEqual([(name, number) for name, number, _ in bars], expected)
+        for _, number, width in bars:
+            self.assertAlmostEqual(width / bars[0][2], number / bars[0][1], delta=0.005)
+        everything = sum(number for _, number in expected)
+        self.assertIn(f"Of {everything} glitches, {expected[0][0]} caused {expected[0][1]} ({math.floor(100 * expected[0][1] / everything + 0.5)} %)", self.text(".findings"))
+        self.assertEqual(self.browser.evaluate("document.querySelectorAll('#glitches tbody tr').length"), 100)
+        newest = page.query("SELECT id, reason FROM glitch ORDER BY began_at DESC LIMIT 1")[0]
+        row = self.browser.evaluate("[...document.querySelectorAll('#glitches tbody tr')][0].innerText")
+        self.assertTrue(row.startswith(str(newest[0])) and newest[1] in row, row)
+
+    def test_says_when_nobody_judged_the_overloads(self):
+        self.show("--days", "10", change="UPDATE glitch SET glitch_id = NULL, cause = NULL, first_cause = NULL, culprit_application = NULL, culprit_process = NULL, culprit_node = NULL")
+        self.assertIn("Nobody judged whose these overloads were", self.text("#culprits"))
+        self.assertIn("not judged", self.text("#glitches"))
+        self.assertNotIn("caused", self.text(".findings"))
+
     def test_gives_each_session_a_lane_of_its_own_on_request(self):
         self.show("--days", "3")
         both = "(kind) => { const lanes = document.getElementById('lanes'); lanes.value = kind; lanes.dispatchEvent(new Event('change')); }"
@@ -273,7 +313,7 @@ class PageTest(unittest.TestCase):
     def test_says_in_words_what_an_empty_store_lacks(self):
         self.show("--days", "1", change=NOTHING)
         text = self.text()
-        for sentence in ("Nothing was recorded in this time", "No session was open in this time.", "No playback was recorded in this time.", "No overload was recorded in this time.",
+        for sentence in ("Nothing was recorded in this time", "No session was open in this time.", "No playback was recorded in this time.", "No overload was recorded in this time.", "No glitch was recorded in this time.",
                          "No driver published counters in this time.", "The haptics engine was not used in this time.", "No daemon answered when this page was made"):
             self.assertIn(sentence, text)
         self.assertEqual(self.browser.evaluate("document.querySelectorAll('.picture').length"), 0)

@@ -140,6 +140,11 @@ ValueMap timeline(ReportTables& tables) {
   timeline.set("issues", ofLanes(tables, "session:i at:d kind:t seconds:d",
                                  {"session, at, kind, duration_seconds", "trouble",
                                   "coalesce(duration_seconds, 0)", "at", ReportData::kMostMarks}));
+  timeline.set("glitches",
+               tables.list("at:d cause:t culprit:t over:d lost:d times:i heard:t",
+                           "SELECT at, cause, culprit, over_ms, lost_ms, times, heard FROM (SELECT * FROM "
+                           "crackled ORDER BY coalesce(over_ms, -1) DESC, id DESC" +
+                               limit(ReportData::kMostGlitches) + ") ORDER BY at"));
   timeline.set(
       "haptics",
       tables.list(
@@ -148,7 +153,7 @@ ValueMap timeline(ReportTables& tables) {
               limit(ReportData::kMostHaptics) + ") ORDER BY at"));
   timeline.set(
       "leftOut",
-      tables.first("sessions:i stretches:i issues:i inputs:i haptics:i misplaced:i",
+      tables.first("sessions:i stretches:i issues:i inputs:i glitches:i haptics:i misplaced:i",
                    "SELECT (SELECT count(*) FROM shown) - (SELECT count(*) FROM lane), max(0, (SELECT "
                    "count(*) FROM played WHERE started IS NOT NULL AND session IN (SELECT id FROM lane)) - " +
                        std::to_string(ReportData::kMostStretches) +
@@ -158,6 +163,8 @@ ValueMap timeline(ReportTables& tables) {
                        "), max(0, (SELECT count(*) FROM heard WHERE started IS NOT NULL AND session IN "
                        "(SELECT id FROM lane)) - " +
                        std::to_string(ReportData::kMostMarks) +
+                       "), max(0, (SELECT count(*) FROM crackled) - " +
+                       std::to_string(ReportData::kMostGlitches) +
                        "), max(0, (SELECT count(*) FROM felt WHERE NOT leaked) - " +
                        std::to_string(ReportData::kMostHaptics) +
                        "), (SELECT count(*) FROM played WHERE misplaced) + (SELECT count(*) FROM heard WHERE "
@@ -271,6 +278,37 @@ ValueMap issues(ReportTables& tables, const LocalOffsets& offsets, const Span& s
   issues.set("stepSeconds", step);
   issues.set("overTime", overloadsOverTime(tables, offsets, step));
   return issues;
+}
+
+// Whose the glitches were. Each overload counts, once for all sessions that heard it.
+ValueMap glitches(ReportTables& tables) {
+  ValueMap glitches =
+      tables.first("count:i judged:i known:i lostMs:d",
+                   "SELECT total(times), total(times) FILTER (WHERE judged), total(times) FILTER "
+                   "(WHERE culprit IS NOT NULL), total(lost_ms) FROM crackled");
+  const std::string sums =
+      "WITH sums AS (SELECT culprit, group_concat(DISTINCT cause) AS causes, sum(times) AS times, "
+      "total(lost_ms) "
+      "AS lost, max(over_ms) AS worst FROM crackled GROUP BY 1), top AS (SELECT * FROM sums ORDER BY times "
+      "DESC, "
+      "lost DESC, culprit" +
+      limit(ReportData::kMostNames) + ") ";
+  glitches.set("top",
+               tables.list("culprit:t causes:t count:i lostMs:d worstMs:d",
+                           sums + "SELECT culprit, substr(causes, 1, 200), times, lost, worst FROM top"));
+  glitches.set("rest",
+               tables.first("names:i count:i lostMs:d",
+                            sums + "SELECT (SELECT count(*) FROM sums) - (SELECT count(*) FROM top), "
+                                   "(SELECT total(times) FROM sums) - (SELECT total(times) FROM top), "
+                                   "(SELECT total(lost) FROM sums) - (SELECT total(lost) FROM top)"));
+  glitches.set(
+      "newest",
+      tables.list("id:i at:d cause:t culprit:t process:t heard:t sessions:i over:d lost:d times:i "
+                  "reason:t judged:i",
+                  "SELECT id, at, cause, culprit, process, heard, sessions, over_ms, lost_ms, times, "
+                  "reason, judged FROM crackled ORDER BY at DESC, id DESC" +
+                      limit(ReportData::kMostListedGlitches)));
+  return glitches;
 }
 
 // What a view of driver channels says for each of `keys`, of the channels that counted most. Of a channel
@@ -439,6 +477,7 @@ ReportData ReportData::read(const std::string& directory, const ReportScope& sco
   data.set("hours", hoursOf(tables, offsets, span));
   data.set("playing", playing(tables));
   data.set("issues", issues(tables, offsets, span));
+  data.set("glitches", glitches(tables));
   data.set("drivers", drivers(tables));
   data.set("haptics", haptics(tables));
   if (scope.session) data.set("session", sessionFacts(tables));

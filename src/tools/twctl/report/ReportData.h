@@ -25,7 +25,9 @@ struct ReportData {
   static constexpr int kLongestSessions =
       320;  // of them those that played longest; the others overloaded most
   static constexpr int kMostStretches = 10'000;
-  static constexpr int kMostMarks = 3'000;  // issues, and as many input stretches
+  static constexpr int kMostMarks = 3'000;         // issues, and as many input stretches
+  static constexpr int kMostGlitches = 1'500;      // in the timeline
+  static constexpr int kMostListedGlitches = 100;  // in their table
   static constexpr int kMostHaptics = 1'000;
   static constexpr int kMostRows = 250;     // in a table of one session
   static constexpr int kMostNames = 12;     // applications, devices

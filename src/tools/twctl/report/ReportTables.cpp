@@ -64,6 +64,34 @@ std::string felt() {
          ReportTables::kInTime;
 }
 
+// A glitch is said in the words of the session that it was worst for. One that nobody has judged has no name.
+std::string crackled() {
+  constexpr const char* kCulprit =
+      "coalesce(culprit_application, CASE coalesce(first_cause, cause) WHEN 'device' THEN 'the device' WHEN "
+      "'graph changed' THEN 'a change of the graph' WHEN 'system slept' THEN 'the system''s sleep' END, "
+      "culprit_process, culprit_node)";
+  std::string sql = "CREATE TEMP TABLE crackled AS WITH chosen AS MATERIALIZED (SELECT ";
+  sql.append("coalesce(glitch_id, 'event ' || id) AS name, id, coalesce(began_at, at) AS happened, session,");
+  sql.append(" substr(application, 1, 100) AS application, substr(coalesce(first_cause, cause), 1, 40) AS");
+  sql.append(" cause, substr(").append(kCulprit).append(", 1, 100) AS culprit, substr(culprit_process, 1,");
+  sql.append(" 100) AS process, substr(reason, 1, 300) AS reason, over_ms, lost_ms, overloads,");
+  sql.append(" coalesce(glitch_id, cause, first_cause) IS NOT NULL AS judged FROM main.glitch");
+  sql.append(" WHERE (?4 IS NULL OR session = ?4) AND (?3 IS NULL OR application GLOB ?3) AND ");
+  sql.append(ReportTables::kInTime);
+  sql.append("), sums AS (SELECT name AS sum_of, min(happened) AS first_at, count(DISTINCT session) AS");
+  sql.append(
+      " sessions, max(overloads) AS times, max(lost_ms) AS lost FROM chosen GROUP BY name) SELECT id,");
+  sql.append(
+      " first_at AS at, cause, culprit, process, application AS heard, sessions, reason, over_ms, lost");
+  sql.append(" AS lost_ms, times, judged FROM (SELECT *, row_number() OVER (PARTITION BY name ORDER BY");
+  return sql.append(
+      " coalesce(over_ms, -1) DESC, id) AS place FROM chosen) JOIN sums ON sum_of = name WHERE place = 1");
+}
+
+constexpr const char* kNoneCrackled =
+    "CREATE TEMP TABLE crackled (id, at, cause, culprit, process, heard, sessions, reason, over_ms, lost_ms, "
+    "times, judged)";
+
 struct Column {
   std::string name;
   char kind;
@@ -100,6 +128,7 @@ bool ReportTables::open(const std::string& directory, double now) {
                 "volume_stretch", misplaced));
   run(stretches("heard", "session, device, mode", "input_stretch", misplaced));
   run(trouble());
+  run(hasGlitches() ? crackled() : kNoneCrackled);
   run(felt());
   return problem_.empty();
 }
@@ -212,6 +241,11 @@ bool ReportTables::hasViews() {
   return fail(
       "it has no views for reports; a daemon of this version adds them when it opens the file, and an empty "
       "file gets them with the first report");
+}
+
+// A daemon of this version adds this view to older stores. A report needs no glitches.
+bool ReportTables::hasGlitches() {
+  return database_.number("SELECT count(*) FROM sqlite_master WHERE name = 'glitch'").value_or(0) == 1;
 }
 
 bool ReportTables::fail(const std::string& problem) {

@@ -37,6 +37,13 @@
     return minutes % 60 ? `${Math.floor(minutes / 60)} h ${minutes % 60} min` : `${minutes / 60} h`;
   }
 
+  // "12.3 ms", "0.25 ms"
+  function milliseconds(number) {
+    if (number === null || number === undefined) return "";
+    if (number >= 1000) return duration(number / 1000);
+    return `${number >= 100 ? Math.round(number) : Number(number.toPrecision(3))} ms`;
+  }
+
   const LAST = 8.64e12 - 86400; // seconds: dates end a day later
   const possible = (time) => Math.min(LAST, Math.max(-LAST, time)); // a program may have chosen it
   // The device's clock at a time, as a date whose UTC fields are those of that clock.
@@ -187,7 +194,7 @@
 
   // ---- What the data say at once
 
-  let played, totals, session, overloaded, isEmpty;
+  let played, totals, session, overloaded, culprits, isEmpty;
   const colours = new Map(); // a device has the same colour in every picture, and keeps it
   const MOST_COLOURS = 7;
   function colour(name) {
@@ -199,6 +206,7 @@
     totals = data.totals;
     session = data.session;
     overloaded = rowsOf(data.issues.byBuffer);
+    culprits = rowsOf(data.glitches.top).filter(({ culprit }) => culprit !== null);
     const { buckets, states, values } = data.drivers;
     isEmpty = totals.sessions + totals.playSeconds + totals.inputSeconds + totals.overloads + totals.otherIssues + totals.hapticsEvents + totals.hapticsLeaks === 0
       && buckets.rows.length + states.rows.length + values.rows.length === 0;
@@ -253,6 +261,11 @@
       said.push(`The audio overloaded ${many(totals.overloads, "time", "times")}${session || totals.overloadedSessions === 0 ? "" : ` in ${many(totals.overloadedSessions, "session", "sessions")}`}${buffer}.`);
     } else {
       said.push("No overload was recorded.");
+    }
+    if (culprits.length) {
+      const [first, second] = culprits;
+      const share = (row) => `${count(row.count)} (${percent(row.count / data.glitches.count)})`;
+      said.push(`Of ${many(data.glitches.count, "glitch", "glitches")}, ${named(first.culprit)} caused ${share(first)}${second ? `, and ${named(second.culprit)} ${share(second)}` : ""}.`);
     }
     if (totals.otherIssues > 0) {
       const kinds = rowsOf(data.issues.byKind).filter(({ kind }) => kind !== "overload").map((row) => `${named(row.kind)} (${count(row.count)})`);
@@ -352,6 +365,10 @@
   // A session that the store does not have yet has no number.
   const nameOfSession = (one) => `${named(one?.application)}${typeof one?.id === "number" ? ` #${one.id}` : ""}`;
 
+  // "Studio: late at 20 Nov 2026, 12:00:00, 3 ms beyond the deadline; heard by Melody"
+  const glitchText = (row) => [`${row.culprit === null ? "Not known whose" : row.culprit}: ${named(row.cause)} at ${at(row.at)}`, row.over === null ? "" : `, ${milliseconds(row.over)} beyond the deadline`,
+    row.lost === null ? "" : `, ${milliseconds(row.lost)} lost`, row.times > 1 ? `, ${count(row.times)} times within a second` : "", `; heard by ${named(row.heard)}`].join("");
+
   // The lanes with their sessions: one a session, or one an application, and more for its sessions at the same time.
   function lanesOf(sessions, mode) {
     if (mode === "session") {
@@ -386,7 +403,7 @@
   function timeline() {
     const LEAST_SHOWN = 60; // seconds, of a live page
     const LIVE_PAD = 5; // seconds: what comes would be an empty picture
-    let sessions, stretches, inputs, issues, haptics, hours, byId, all, pad;
+    let sessions, stretches, inputs, issues, glitches, haptics, hours, byId, all, pad;
     function read() {
       const now = running();
       const runs = new Set(now.sessions.map(({ id }) => id));
@@ -394,6 +411,7 @@
       stretches = [...rowsOf(data.timeline.played).filter((row) => !runs.has(row.session)).map((row) => ({ ...row, ended: row.ended ?? row.started })), ...now.stretches];
       inputs = rowsOf(data.timeline.heard).map((row) => ({ ...row, ended: row.ended ?? row.started }));
       issues = rowsOf(data.timeline.issues);
+      glitches = rowsOf(data.timeline.glitches);
       haptics = rowsOf(data.timeline.haptics);
       hours = session || data.until - data.from < 4 * 3600 ? [] : data.hours.map(([from, seconds, , until]) => ({ from, seconds, until }));
       byId = new Map(sessions.map((one) => [one.id, one]));
@@ -449,7 +467,8 @@
       const topOf = (id) => top + laneOf.get(id) * LANE + LABEL;
       const baseOf = (id) => topOf(id) + BAND + VOLUME;
       const hasLane = (row) => laneOf.has(row.session ?? row.id);
-      const hapticsTop = top + lanes.length * LANE;
+      const glitchTop = top + lanes.length * LANE;
+      const hapticsTop = glitchTop + (glitches.length ? LABEL + 22 : 0);
       const height = hapticsTop + (haptics.length ? LABEL + 22 : 0);
       const most = Math.max(1, ...hours.map(({ seconds }) => seconds));
       const x = (time) => new Date(possible(time) * 1000);
@@ -463,6 +482,7 @@
       const marks = issues.filter((row) => hasLane(row) && inside(row.at, row.at));
       const overloads = marks.filter((row) => row.kind === "overload");
       const others = marks.filter((row) => row.kind !== "overload");
+      const crackled = glitches.filter((row) => inside(row.at, row.at));
       const felt = haptics.filter((row) => inside(row.at, row.at));
       const visible = hours.filter((row) => inside(row.from, row.until));
       const nameOf = (row) => nameOfSession(byId.get(row.session ?? row.id));
@@ -479,6 +499,7 @@
       const heightOf = (id, volume) => baseOf(id) - VOLUME * Math.min(1, Math.max(0, volume ?? 0));
       const labels = lanes.map((lane, i) => ({ y: top + i * LANE + LABEL - 5, text: lane.label }));
       if (hours.length) labels.unshift({ y: LABEL - 5, text: "All sessions: time played in each hour, added up" });
+      if (glitches.length) labels.push({ y: glitchTop + LABEL - 5, text: "Glitches, and whose they were" });
       if (haptics.length) labels.push({ y: hapticsTop + LABEL - 5, text: "Haptics" });
       const letters = Math.min(MOST_LETTERS, Math.floor(size / 7.4));
 
@@ -511,6 +532,8 @@
             title: (d) => `${nameOf(d)}: overload at ${at(d.at)}, ${duration(d.seconds)}` }, (d) => ({ mark: "overload", session: d.session, at: d.at }))),
           charts.dot(others, tagged(others, { x: (d) => x(d.at), y: (d) => baseOf(d.session) - VOLUME / 2, symbol: "diamond", r: 4, fill: "var(--ink)",
             title: (d) => `${nameOf(d)}: ${named(d.kind)} at ${at(d.at)}` }, (d) => ({ mark: "issue", session: d.session, kind: named(d.kind) }))),
+          charts.ruleX(crackled, tagged(crackled, { x: (d) => x(d.at), y1: glitchTop + LABEL, y2: glitchTop + LABEL + 16, strokeWidth: 1.5, stroke: (d) => (d.culprit === null ? "var(--c8)" : "var(--bad)"),
+            title: glitchText }, (d) => ({ mark: "glitch", at: d.at, culprit: named(d.culprit), cause: named(d.cause) }))),
           charts.ruleX(felt, tagged(felt, { x: (d) => x(d.at), y1: hapticsTop + LABEL, y2: hapticsTop + LABEL + 16, stroke: "var(--c4)", strokeOpacity: 0.7,
             title: (d) => `${named(d.application)}: ${duration(d.seconds)} at ${at(d.at)}` }, (d) => ({ mark: "haptics", at: d.at }))),
           charts.text(labels, { frameAnchor: "left", y: "y", text: (d) => shortened(d.text, letters), textAnchor: "start", dx: 2, fill: "var(--ink)", stroke: "var(--page)", strokeWidth: 4 }),
@@ -523,7 +546,8 @@
       return svg;
     }
 
-    const legendNow = () => [...deviceLegend(stretches), ["volume", "var(--ink)", "thin"], ["ringer on", "var(--bell)", "thin"], ["input", "var(--input)", "thin"], ["overload", "var(--bad)", "tick"],
+    const legendNow = () => [...deviceLegend(stretches), ["volume", "var(--ink)", "thin"], ["ringer on", "var(--bell)", "thin"], ["input", "var(--input)", "thin"], [glitches.length ? "overload, glitch" : "overload", "var(--bad)", "tick"],
+      ...(glitches.some(({ culprit }) => culprit === null) ? [["glitch, not known whose", "var(--c8)", "tick"]] : []),
       ...(issues.some(({ kind }) => kind !== "overload") ? [["other issue (diamond)", "var(--ink)", "tick"]] : []), ...(haptics.length ? [["haptics", "var(--c4)", "tick"]] : [])];
     const made = figure({
       id: "timeline", title, columns, rows: sessions, draw,
@@ -627,6 +651,7 @@
       if (out.stretches > 0) missing.push(`${many(out.stretches, "short stretch", "short stretches")}`);
       if (out.issues > 0) missing.push(`${many(out.issues, "short issue", "short issues")}`);
       if (out.inputs > 0) missing.push(`${many(out.inputs, "short input", "short inputs")}`);
+      if (out.glitches > 0) missing.push(`${many(out.glitches, "short glitch", "short glitches")}`);
       if (out.haptics > 0) missing.push(`${many(out.haptics, "short haptic event", "short haptic events")}`);
       if (out.misplaced > 0) missing.push(`${many(out.misplaced, "stretch", "stretches")} with a time that cannot be`);
       const text = missing.length ? `Left out of the lanes: ${missing.join(", ")}. All other numbers on the page count them.` : "";
@@ -713,24 +738,26 @@
   }
 
   // bars: [{name, parts: [{device, seconds}], seconds}], longest first
-  function barFigure({ id, title, about, bars, columns, rows, emptyText, legendOf }) {
+  // `counts`: what `seconds` counts, where it is no time.
+  function barFigure({ id, title, about, bars, columns, rows, emptyText, legendOf, counts }) {
     if (bars.length === 0) return figure({ id, title, emptyText });
     const parts = bars.flatMap(({ name, parts: all }) => all.map((part) => ({ ...part, name })));
     const longest = Math.max(...bars.map(({ seconds }) => seconds), 0.001);
-    const unit = unitFor(longest);
+    const unit = counts ? { seconds: 1, name: counts } : unitFor(longest);
+    const length = counts ? count : duration;
     return figure({
       id, title, about, columns, rows, legendOf,
       draw(width) {
         const left = Math.min(170, Math.max(96, width * 0.28));
         return plot({
           width, height: bars.length * 28 + 40, marginLeft: left, marginRight: 84, marginTop: 4, marginBottom: 34,
-          x: { domain: [0, longest / unit.seconds], label: unit.name, ticks: Math.max(2, Math.round((width - left - 84) / 70)), labelArrow: "none" },
+          x: { domain: [0, longest / unit.seconds], label: unit.name, ticks: Math.min(counts ? longest : Infinity, Math.max(2, Math.round((width - left - 84) / 70))), labelArrow: "none" },
           y: { type: "band", domain: bars.map(({ name }) => name), label: null, tickFormat: (name) => shortened(name, Math.floor(left / 7.2)), tickSize: 0, padding: 0.25 },
           marks: [
             charts.gridX({ stroke: "var(--line)", strokeOpacity: 1 }),
-            charts.barX(parts, tagged(parts, { x: (d) => d.seconds / unit.seconds, y: "name", fill: (d) => d.colour ?? colourOf(d.device), title: (d) => `${d.name}${d.device === undefined ? "" : `, ${named(d.device)}`}: ${duration(d.seconds)}` },
+            charts.barX(parts, tagged(parts, { x: (d) => d.seconds / unit.seconds, y: "name", fill: (d) => d.colour ?? colourOf(d.device), title: (d) => `${d.name}${d.device === undefined ? "" : `, ${named(d.device)}`}: ${length(d.seconds)}` },
               (d) => ({ mark: "bar", name: d.name, seconds: d.seconds }))),
-            charts.text(bars, { x: (d) => d.seconds / unit.seconds, y: "name", text: (d) => duration(d.seconds), textAnchor: "start", dx: 5, fill: "var(--ink)", stroke: "var(--page)", strokeWidth: 4 }),
+            charts.text(bars, { x: (d) => d.seconds / unit.seconds, y: "name", text: (d) => length(d.seconds), textAnchor: "start", dx: 5, fill: "var(--ink)", stroke: "var(--page)", strokeWidth: 4 }),
           ],
         });
       },
@@ -825,6 +852,34 @@
       emptyText: "No overload was recorded in this time.",
     });
   }
+
+  // ---- Glitches
+
+  const MOST_LISTED = 100;
+  function whoseGlitches() {
+    const { rest, judged } = data.glitches;
+    const rows = rowsOf(data.glitches.top);
+    const bars = rows.map(({ culprit, count: number }) => ({ name: named(culprit), seconds: number, parts: [{ seconds: number, colour: culprit === null ? "var(--c8)" : "var(--bad)" }] }));
+    if (rest.names > 0) bars.push({ name: many(rest.names, "other", "others"), seconds: rest.count, parts: [{ seconds: rest.count, colour: "var(--c8)" }] });
+    return barFigure({
+      id: "culprits", title: "Whose glitches", counts: "glitches", bars: judged > 0 ? bars : [], rows,
+      about: "Who caused how many, as the PipeWire bridge judges. An overload that several sessions heard counts once.",
+      columns: [["Who", (row) => named(row.culprit)], ["Causes", (row) => (row.causes ?? "").split(",").filter(Boolean).join(", ") || UNKNOWN], ["Glitches", (row) => count(row.count), true],
+        ["Share", (row) => percent(row.count / data.glitches.count), true], ["Lost", (row) => milliseconds(row.lostMs), true], ["Worst, beyond the deadline", (row) => milliseconds(row.worstMs), true]],
+      emptyText: data.glitches.count > 0 ? "Nobody judged whose these overloads were: the PipeWire bridge does, while it runs." : "No glitch was recorded in this time.",
+    });
+  }
+
+  function newestGlitches() {
+    const rows = rowsOf(data.glitches.newest);
+    if (rows.length === 0) return null;
+    return el("figure", { id: "glitches" }, el("figcaption", {}, el("h3", {}, "Glitches one by one"),
+      el("p", {}, `${rows.length === MOST_LISTED ? `The newest ${MOST_LISTED}.` : "The newest first."} “twctl glitches --why” and the number shows the cycles around one, and what to do.`)),
+    table([["Number", (row) => String(row.id)], ["Time", (row) => at(row.at)], ["Cause", (row) => row.cause ?? (row.judged ? UNKNOWN : "not judged")], ["Who", (row) => `${named(row.culprit)}${row.process && row.process !== row.culprit ? ` (${row.process})` : ""}`],
+      ["Heard by", (row) => `${named(row.heard)}${row.sessions > 1 ? `, in ${count(row.sessions)} sessions` : ""}`], ["Beyond the deadline", (row) => milliseconds(row.over), true], ["Lost", (row) => milliseconds(row.lost), true],
+      ["Times", (row) => count(row.times), true], ["Reason", (row) => row.reason ?? ""]], rows));
+  }
+  const glitchParts = () => [whoseGlitches(), newestGlitches()].filter(Boolean);
 
   // ---- Drivers
 
@@ -965,9 +1020,9 @@
   function partsNow() {
     const beginning = [() => [heading()], ...(data.live ? [liveMark] : []), () => [el("ul", { class: "findings" }, ...findings().map((text) => el("li", {}, text)))], () => [numbers()], section("Timeline"), timelinePart];
     const middle = session
-      ? [sessionTables, ...(totals.overloads > 0 ? [section("Overloads"), () => [overloadsByBuffer()]] : [])]
+      ? [sessionTables, ...(totals.overloads > 0 ? [section("Overloads"), () => [overloadsByBuffer()]] : []), ...(data.glitches.count > 0 ? [section("Glitches"), glitchParts] : [])]
       : [() => [heatMap()], section("Where the time went"), () => [byApplication()], () => [el("div", { class: "pair" }, byDevice(), byVolume())],
-        section("Overloads"), () => [el("div", { class: "pair" }, overloadsOverTime(), overloadsByBuffer())]];
+        section("Overloads"), () => [el("div", { class: "pair" }, overloadsOverTime(), overloadsByBuffer())], section("Glitches"), glitchParts];
     return [...beginning, ...middle, section("Drivers"), drivers, ...(session ? [] : [section("Haptics and formats"), () => [otherTables()]]),
       ...(data.daemon ? [section("The daemon's own health"), health] : []), () => [footer()]];
   }

@@ -198,6 +198,96 @@ TEST_F(ReportDataTest, CountsOverloadsByBufferSizeAndDay) {
 }
 
 // With one offset for all days, an overload just after midnight was counted for the day before.
+TEST_F(ReportDataTest, SaysWhoseTheGlitchesWereAndCountsOneOfTwoSessionsOnce) {
+  views_.played(1, "Melody", kDay, 3600.0, "Speaker", 0.5);
+  views_.played(2, "Studio", kDay, 3600.0, "Speaker", 0.5);
+  views_.glitched({.event = 1,
+                   .session = 1,
+                   .at = kDay + 5.0,
+                   .id = "5-1",
+                   .cause = "waiting for another",
+                   .application = "Studio",
+                   .over = 2.0,
+                   .lost = 5.0});
+  views_.glitched({.event = 2,
+                   .session = 2,
+                   .at = kDay + 5.0,
+                   .id = "5-1",
+                   .application = "Studio",
+                   .reason = "It was late.",
+                   .over = 3.0,
+                   .lost = 4.0});
+  views_.glitched({.event = 3,
+                   .session = 1,
+                   .at = kDay + 6.0,
+                   .id = "6-1",
+                   .cause = "device",
+                   .firstCause = "device",
+                   .over = 1.0,
+                   .lost = 1.0,
+                   .overloads = 3});
+  views_.glitched({.event = 4,
+                   .session = 1,
+                   .at = kDay + 7.0,
+                   .id = "",
+                   .cause = "",
+                   .firstCause = "",
+                   .node = "",
+                   .device = "",
+                   .over = -1.0,
+                   .lost = -1.0});
+  const ValueMap data = read();
+  EXPECT_EQ(at(data, {"glitches", "count"}), "5");
+  EXPECT_EQ(at(data, {"glitches", "judged"}), "4");
+  EXPECT_EQ(at(data, {"glitches", "known"}), "4");
+  EXPECT_EQ(at(data, {"glitches", "lostMs"}), "6");
+  EXPECT_EQ(rows(data, "glitches", "top"),
+            R"([["the device","device",3,1.0,1.0],["Studio","late",1,5.0,3.0],[null,null,1,0.0,null]])");
+  EXPECT_EQ(
+      rows(data, "timeline", "glitches"),
+      R"([[1795132805.0,"late","Studio",3.0,5.0,1,"Studio"],[1795132806.0,"device","the device",1.0,1.0,3,)"
+      R"("Melody"],[1795132807.0,null,null,null,null,1,"Melody"]])");
+  EXPECT_THAT(rows(data, "glitches", "newest"),
+              HasSubstr(R"([2,1795132805.0,"late","Studio",null,"Studio",2,3.0,5.0,1,"It was late.",1])"));
+  // Of one session only what it heard.
+  EXPECT_EQ(at(read({.session = 2}), {"glitches", "count"}), "1");
+  EXPECT_EQ(at(read({.since = kDay + 6.5}), {"glitches", "count"}), "1");
+}
+
+TEST_F(ReportDataTest, BoundsWhatItTakesOfGlitchesWhateverTheySay) {
+  views_.played(1, "Melody", kDay, 3600.0, "Speaker", 0.5);
+  const std::string text(2000, 'x');
+  views_.glitched({.event = 1,
+                   .at = kDay,
+                   .id = "1-1",
+                   .cause = text,
+                   .firstCause = text,
+                   .application = text,
+                   .process = text,
+                   .device = text,
+                   .chain = text,
+                   .reason = text,
+                   .over = 1e9,
+                   .lost = 1e9});
+  views_.run(
+      "WITH RECURSIVE n(i) AS (SELECT 2 UNION ALL SELECT i + 1 FROM n WHERE i < 2000) INSERT INTO glitch "
+      "SELECT "
+      "i, at + i, began_at + i, i || '-1', session, service, application, cause, first_cause, confidence, "
+      "culprit_application || i, culprit_process, culprit_pid, culprit_node, node, device, chain, over_ms, "
+      "period_ms, quantum, rate, lost_ms, overloads, reason, cycles FROM glitch, n");
+  const ValueMap data = read();
+  EXPECT_EQ(at(data, {"glitches", "count"}), "2000");
+  EXPECT_EQ(at(data, {"timeline", "leftOut", "glitches"}), "500");
+  EXPECT_LT(data.find("timeline")->asMap()->text("glitches").size(), 500'000U);
+  EXPECT_LT(data.text("glitches").size(), 120'000U);
+}
+
+TEST_F(ReportDataTest, AStoreThatAnEarlierDaemonHasMadeHasNoGlitchesAndIsNoFailure) {
+  views_.played(1, "Melody", kDay, 3600.0, "Speaker", 0.5);
+  views_.run("DROP TABLE glitch");
+  EXPECT_EQ(at(read(), {"glitches", "count"}), "0");
+}
+
 TEST_F(ReportDataTest, CountsOverloadsByTheDaysOfAClockThatChanges) {
   setenv("TZ", "Europe/Berlin", 1);
   tzset();
