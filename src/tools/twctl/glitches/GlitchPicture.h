@@ -9,8 +9,8 @@
 
 namespace tonewerk {
 
-// Draws the cycles around a glitch as text: a line for each node of a cycle, on one scale of time, so that one
-// sees who came when, how long it took, and who went beyond the end of the period.
+// Draws the cycles around a glitch as text: a line for each node of a cycle, on one scale of time, so that
+// one sees who came when, how long it took, and who went beyond the end of the period.
 //
 //   the glitch's cycle, of 5.33 ms
 //     studio        ██████████████████████|▓▓▓▓▓▓▓▓▓▓▓  8.4 ms

@@ -12,8 +12,8 @@
 
 namespace tonewerk {
 
-// Prints glitches: for people in columns, of which the less important ones go where the terminal is narrow; for
-// programs with the names of the view `glitch`.
+// Prints glitches: for people in columns, of which the less important ones go where the terminal is narrow;
+// for programs with the names of the view `glitch`.
 class GlitchesTable {
  public:
   // `width`: that of the terminal; none for any.

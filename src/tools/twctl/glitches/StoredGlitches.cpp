@@ -93,8 +93,8 @@ const char* expressionOf(GlitchKey key) {
   return "strftime('%Y-%m-%d %H:00', happened, 'unixepoch', 'localtime')";
 }
 
-// The glitches that a person may have meant: the nearest in time where the text begins with one, as identifiers
-// do, else the newest.
+// The glitches that a person may have meant: the nearest in time where the text begins with one, as
+// identifiers do, else the newest.
 std::string nearest(SqlReader& reader, const std::string& id) {
   constexpr std::size_t kLeastDigits = 12;  // of milliseconds since 1970
   constexpr std::size_t kMostDigits = 15;

@@ -52,8 +52,8 @@ struct GlitchSums {
   std::int64_t glitches = 0;  // of all, also of the sums that the limit leaves out
 };
 
-// Calls `take` for each glitch of the filter, the oldest first. False when the store cannot be read; `problem`
-// says why.
+// Calls `take` for each glitch of the filter, the oldest first. False when the store cannot be read;
+// `problem` says why.
 [[nodiscard]] bool readGlitches(SqlReader& reader, const GlitchFilter& filter, std::string& problem,
                                 const std::function<void(const StoredGlitch& glitch)>& take);
 

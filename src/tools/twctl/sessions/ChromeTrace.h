@@ -26,7 +26,8 @@ namespace tonewerk {
 //   threads   cycles: a slice for each, which ends at the deadline
 //             one for each node: slices for as long as it waited and ran
 //
-// A cycle that is near two glitches is there once. A session that has not ended goes on until the last time that the store has of it.
+// A cycle that is near two glitches is there once. A session that has not ended goes on until
+// the last time that the store has of it.
 // `cycles`: those around glitches, by their events.
 [[nodiscard]] std::string chromeTrace(const StoredSession& session, const SessionRecords& records,
                                       const std::map<std::int64_t, std::vector<GlitchCycle>>& cycles = {});

@@ -51,8 +51,8 @@ struct SessionRecords {
 [[nodiscard]] std::optional<SessionRecords> readRecords(SqlReader& reader, std::int64_t session,
                                                         std::string& problem);
 
-// The cycles around the glitches of a session, as JSON, by their events; of the newest kMostGlitches. None when
-// the store cannot be read; `problem` then says why.
+// The cycles around the glitches of a session, as JSON, by their events; of the newest kMostGlitches. None
+// when the store cannot be read; `problem` then says why.
 inline constexpr int kMostGlitches = 1000;
 [[nodiscard]] std::optional<std::map<std::int64_t, std::string>> readCycles(SqlReader& reader,
                                                                             std::int64_t session,

@@ -71,7 +71,7 @@ std::string whatRuns(const ReasonedLife::Walk& walk) {
   return walk.about.text(reasons::kKey).find("input") == std::string::npos ? "output" : "input";
 }
 
-// "cause: late, culprit org.example.Studio (studio, 4711), at least 3.07 ms beyond the deadline, 5.33 ms lost"
+// "cause: late, culprit org.example.Studio (studio, 4711), at least 3.07 ms beyond the deadline"
 std::string verdictText(const GlitchVerdict& verdict) {
   if (!verdict.sharedCause()) return "whose it was could not be told";
   const std::string waiting = "waiting for another";
