@@ -9,7 +9,7 @@
 #include <string>
 #include <vector>
 
-#include "bridges/pipewire/kernel/KernelClocks.h"
+#include "bridges/pipewire/kernel/KernelCalls.h"
 #include "bridges/pipewire/kernel/KernelMoments.h"
 
 namespace tonewerk {
@@ -31,15 +31,15 @@ class KernelSampler {
   static constexpr std::size_t kMaxThreadsOfProcess = 8;
   static constexpr std::size_t kMaxRealTimeThreads = 64;  // of the machine, in which hogs are looked for
 
-  // The directories that the kernel's files are in; copies of their layout in tests.
+  // The directories that the kernel's files are in: "/proc" and "/sys", or copies of their layout in tests.
   struct Roots {
-    std::string proc = "/proc";
-    std::string sys = "/sys";
+    std::string proc;
+    std::string sys;
   };
 
-  // `clocks` outlives this object.
-  explicit KernelSampler(const KernelClocks& clocks) : KernelSampler(clocks, Roots()) {}
-  KernelSampler(const KernelClocks& clocks, Roots roots);
+  // `calls` outlives this object.
+  explicit KernelSampler(const KernelCalls& calls);
+  KernelSampler(const KernelCalls& calls, const Roots& roots);
   KernelSampler(const KernelSampler&) = delete;
   KernelSampler& operator=(const KernelSampler&) = delete;
   ~KernelSampler();
