@@ -19,12 +19,16 @@ constexpr std::int64_t kMaxFrames = 1 << 20;
 constexpr std::uint32_t kMaxHertz = 1 << 24;
 constexpr nanoseconds kMaxDuration = std::chrono::seconds(60);
 
-// Activation status of a node that has finished its cycle.
-constexpr std::int32_t kFinished = 3;
+// Activation status of a node in its cycle. One that no cycle has triggered yet has another status.
+constexpr std::int32_t kTriggered = 1;
+constexpr std::int32_t kWoken = 2;
+constexpr std::int32_t kDone = 3;
 
 struct NodeBlock {
   std::int32_t node = 0;
-  std::int64_t signal = 0;  // when it was woken; monotonic nanoseconds, like `finish`
+  // Monotonic nanoseconds. Until the node has reached that point of its cycle, they are of an earlier one.
+  std::int64_t signal = 0;
+  std::int64_t awake = 0;
   std::int64_t finish = 0;
   std::int32_t status = 0;
   std::int32_t xruns = -1;  // -1 in earlier releases of PipeWire, which do not count them
@@ -34,11 +38,10 @@ std::optional<NodeBlock> nodeBlockOf(const spa_pod& pod) {
   NodeBlock block;
   const char* name = nullptr;
   std::int64_t previousSignal = 0;
-  std::int64_t awake = 0;
   spa_fraction latency{};
   const int result = spa_pod_parse_struct(
       &pod, SPA_POD_Int(&block.node), SPA_POD_String(&name), SPA_POD_Long(&previousSignal),
-      SPA_POD_Long(&block.signal), SPA_POD_Long(&awake), SPA_POD_Long(&block.finish),
+      SPA_POD_Long(&block.signal), SPA_POD_Long(&block.awake), SPA_POD_Long(&block.finish),
       SPA_POD_Int(&block.status), SPA_POD_Fraction(&latency), SPA_POD_OPT_Int(&block.xruns));
   if (result < 0) return std::nullopt;
   return block;
@@ -74,6 +77,7 @@ bool readClock(const spa_pod& pod, ProfiledCycle& cycle) {
   cycle.frames = static_cast<std::uint32_t>(frames);
   cycle.position = static_cast<std::uint64_t>(position);
   cycle.period = nanoseconds(static_cast<std::int64_t>(seconds * 1e9));
+  cycle.hertz = rate.denom / rate.num;
   return true;
 }
 
@@ -88,11 +92,25 @@ bool readDriver(const spa_pod& pod, ProfiledCycle& cycle) {
   return true;
 }
 
+std::optional<nanoseconds> timeOf(std::int64_t value) {
+  return value > 0 ? std::optional(nanoseconds(value)) : std::nullopt;
+}
+
+NodeTimes timesOf(const NodeBlock& block) {
+  NodeTimes times;
+  if (block.status < kTriggered || block.status > kDone) return times;
+  times.stage = static_cast<NodeTimes::Stage>(block.status);
+  times.signal = timeOf(block.signal);
+  if (block.status >= kWoken && block.awake >= block.signal) times.awake = timeOf(block.awake);
+  if (block.status >= kDone && block.finish >= block.signal) times.finish = timeOf(block.finish);
+  return times;
+}
+
 void addFollower(const spa_pod& pod, ProfiledCycle& cycle) {
   const std::optional<NodeBlock> block = nodeBlockOf(pod);
   if (!block) return;
-  ProfiledFollower follower{static_cast<std::uint32_t>(block->node), block->status == kFinished,
-                            std::nullopt};
+  ProfiledFollower follower{static_cast<std::uint32_t>(block->node), block->status == kDone, std::nullopt,
+                            timesOf(*block)};
   if (block->xruns >= 0) follower.xruns = static_cast<std::uint32_t>(block->xruns);
   cycle.followers.push_back(follower);
 }

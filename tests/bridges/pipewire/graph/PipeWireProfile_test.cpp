@@ -36,6 +36,7 @@ class ProfileMaker {
     std::int64_t signal = 1'000'000;
     std::int64_t finish = 3'000'000;
     std::int32_t status = 3;
+    std::int64_t awake = 0;   // shortly after the signal
     std::int32_t xruns = -1;  // left out
   };
 
@@ -76,7 +77,7 @@ class ProfileMaker {
     spa_pod_builder_string(&builder_, "name");
     spa_pod_builder_long(&builder_, 0);
     spa_pod_builder_long(&builder_, node.signal);
-    spa_pod_builder_long(&builder_, node.signal + 10);
+    spa_pod_builder_long(&builder_, node.awake == 0 ? node.signal + 10 : node.awake);
     spa_pod_builder_long(&builder_, node.finish);
     spa_pod_builder_int(&builder_, node.status);
     spa_pod_builder_fraction(&builder_, 480, 48'000);
@@ -129,8 +130,32 @@ TEST(PipeWireProfile, ReadsACycleAndItsFollowers) {
   EXPECT_EQ(cycles[0].period, microseconds(10'000));
   EXPECT_EQ(cycles[0].begin, nanoseconds(1'000'000));
   EXPECT_EQ(cycles[0].processing, nanoseconds(2'000'000));
-  EXPECT_THAT(cycles[0].followers, ElementsAre(ProfiledFollower{42, true, std::nullopt},  //
-                                               ProfiledFollower{43, false, 8}));
+  EXPECT_EQ(cycles[0].hertz, 48'000U);
+  const auto at = [](std::int64_t time) { return std::optional(nanoseconds(time)); };
+  EXPECT_THAT(
+      cycles[0].followers,
+      ElementsAre(
+          ProfiledFollower{
+              42, true, std::nullopt, {NodeTimes::kFinished, at(1'000'000), at(1'000'010), at(3'000'000)}},
+          ProfiledFollower{43, false, 8, {NodeTimes::kSignalled, at(1'000'000), {}, {}}}));
+}
+
+// Until a node has reached a point of its cycle, the time of that point is of an earlier cycle.
+TEST(PipeWireProfile, LeavesOutTimesOfEarlierCycles) {
+  ProfileMaker maker;
+  maker.beginCycle().info(91, 3).clock({}).driver({});
+  maker.follower({.status = 0}).follower({.status = 1}).follower({.status = 2});
+  // It was still busy when it was signalled, and finished two cycles at once.
+  maker.follower({.status = 3, .awake = 900'000}).follower({.status = 7}).endCycle();
+  const std::vector<ProfiledCycle> cycles = maker.cycles();
+  ASSERT_THAT(cycles, SizeIs(1));
+  std::vector<std::string> known;
+  for (const ProfiledFollower& follower : cycles[0].followers) {
+    const NodeTimes& times = follower.times;
+    known.push_back(std::string(times.signal ? "signal " : "") + (times.awake ? "awake " : "") +
+                    (times.finish ? "finish" : ""));
+  }
+  EXPECT_THAT(known, ElementsAre("", "signal ", "signal awake ", "signal finish", ""));
 }
 
 TEST(PipeWireProfile, ReadsTheCyclesOfSeveralDriversInTheirOrder) {
