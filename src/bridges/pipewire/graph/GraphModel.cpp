@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "bridges/pipewire/graph/GraphModel.h"
 
+#include <algorithm>
 #include <charconv>
 #include <set>
 #include <utility>
@@ -11,11 +12,17 @@ namespace tonewerk {
 
 namespace {
 
-std::optional<std::uint32_t> identifierOf(std::string_view text) {
-  std::uint32_t value = 0;
+template <typename Number>
+std::optional<Number> numberOf(std::string_view text) {
+  Number value = 0;
   const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), value);
   if (error != std::errc() || end != text.data() + text.size()) return std::nullopt;
   return value;
+}
+
+// 0 when it is not the identifier of a process.
+std::int32_t processOf(const Properties& client, std::string_view key) {
+  return std::max(numberOf<std::int32_t>(propertyOf(client, key)).value_or(0), 0);
 }
 
 std::optional<DriverNode> driverOf(const Properties& node) {
@@ -32,9 +39,11 @@ void mergeInto(Properties& properties, const Properties& update) {
 }  // namespace
 
 void GraphModel::nodeAppeared(std::uint32_t node, const Properties& properties) {
+  const bool isNew = !nodes_.contains(node);
   mergeInto(nodes_[node].properties, properties);
   reportAllStreams();
   reportDriverChange(nodes_[node].properties);
+  if (isNew) onShapeChanged_();
 }
 
 void GraphModel::nodeDescribed(std::uint32_t node, bool running, const Properties& properties) {
@@ -70,6 +79,7 @@ void GraphModel::clientDescribed(std::uint32_t client, const Properties& propert
 void GraphModel::linkAppeared(std::uint32_t link, std::uint32_t outputNode, std::uint32_t inputNode) {
   links_[link] = {outputNode, inputNode};
   reportStream(outputNode);
+  onShapeChanged_();
 }
 
 void GraphModel::complete() {
@@ -83,6 +93,7 @@ void GraphModel::removed(std::uint32_t object) {
     const std::uint32_t stream = link->second.outputNode;
     links_.erase(link);
     reportStream(stream);
+    onShapeChanged_();
   }
   const auto node = nodes_.find(object);
   if (node == nodes_.end()) return;
@@ -92,6 +103,7 @@ void GraphModel::removed(std::uint32_t object) {
   if (wasReported) observer_.streamGone(object);
   reportAllStreams();
   reportDriverChange(properties);
+  onShapeChanged_();
 }
 
 void GraphModel::clear() {
@@ -103,6 +115,7 @@ void GraphModel::clear() {
     if (node.reported) observer_.streamGone(identifier);
   }
   onDriversChanged_();
+  onShapeChanged_();
 }
 
 std::map<std::uint32_t, DriverNode> GraphModel::drivers() const {
@@ -120,8 +133,34 @@ std::optional<DriverNode> GraphModel::driverAt(std::uint32_t node) const {
   return found == nodes_.end() ? std::nullopt : driverOf(found->second.properties);
 }
 
+NodeOwner GraphModel::ownerOf(std::uint32_t node) const {
+  NodeOwner owner;
+  const auto found = nodes_.find(node);
+  if (found == nodes_.end()) return owner;
+  static const Properties kNoClient;
+  const Properties* known = clientOf(found->second);
+  const Properties& client = known == nullptr ? kNoClient : *known;
+  const Properties& properties = found->second.properties;
+  owner.name = cleanText(propertyOf(properties, kNodeNameKey));
+  owner.application = applicationOf(properties, client);
+  owner.binary = cleanText(propertyOf(client, kApplicationBinaryKey));
+  owner.computingProcess = processOf(client, kSocketProcessKey);
+  owner.process = processOf(client, kApplicationProcessKey);
+  if (owner.process == 0) owner.process = owner.computingProcess;
+  if (owner.computingProcess == 0) owner.computingProcess = owner.process;
+  owner.isOutputStream = isOutputStream(properties);
+  return owner;
+}
+
+std::vector<NodeLink> GraphModel::nodeLinks() const {
+  std::set<NodeLink> links;
+  for (const auto& [identifier, link] : links_) links.insert({link.outputNode, link.inputNode});
+  return {links.begin(), links.end()};
+}
+
 const Properties* GraphModel::clientOf(const Node& node) const {
-  const std::optional<std::uint32_t> identifier = identifierOf(propertyOf(node.properties, kClientIDKey));
+  const std::optional<std::uint32_t> identifier =
+      numberOf<std::uint32_t>(propertyOf(node.properties, kClientIDKey));
   const auto client = identifier ? clients_.find(*identifier) : clients_.end();
   return client == clients_.end() ? nullptr : &client->second;
 }

@@ -1,10 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <compare>
 #include <cstdint>
 #include <functional>
 #include <map>
 #include <optional>
+#include <string>
+#include <vector>
 
 #include "bridges/pipewire/graph/DriverNode.h"
 #include "bridges/pipewire/graph/StreamDescription.h"
@@ -23,9 +26,29 @@ class StreamObserver {
   virtual void streamGone(std::uint32_t stream) = 0;
 };
 
+// Says whose a node is.
+struct NodeOwner {
+  std::string name;          // of the node
+  std::string application;   // like a stream's; empty when it is not known
+  std::string binary;        // of its process, as the process says
+  std::int32_t process = 0;  // identifier of the application's process, 0 unknown
+  // Identifier of the process in which the node computes, 0 unknown. It differs from `process` when the
+  // application speaks to PipeWire through another process.
+  std::int32_t computingProcess = 0;
+  bool isOutputStream = false;
+};
+
+// Leads audio from one node to another.
+struct NodeLink {
+  std::uint32_t output = 0;  // the node that the audio comes from
+  std::uint32_t input = 0;
+
+  friend auto operator<=>(const NodeLink&, const NodeLink&) = default;
+};
+
 // Holds the relevant part of an audio graph: streams, the clients that own them, the sinks they are linked
-// to, and the sinks and sources that drive other nodes. It is built from the objects' descriptions, which
-// arrive one by one in any order.
+// to, the sinks and sources that drive other nodes, and the nodes between. It is built from the objects'
+// descriptions, which arrive one by one in any order.
 //
 // No stream is reported before complete(), because the sink of a stream may be described after the stream.
 //
@@ -58,6 +81,13 @@ class GraphModel {
   // Runs `onChange` whenever drivers() may differ, from inside the functions above.
   void watchDrivers(std::function<void()> onChange) { onDriversChanged_ = std::move(onChange); }
 
+  // Whose a node is; only empty values for one that is not in the graph.
+  NodeOwner ownerOf(std::uint32_t node) const;
+  // Each pair of nodes once, in ascending order.
+  std::vector<NodeLink> nodeLinks() const;
+  // Runs `onChange` whenever a node or a link has come or gone, from inside the functions above.
+  void watchShape(std::function<void()> onChange) { onShapeChanged_ = std::move(onChange); }
+
  private:
   struct Node {
     Properties properties;
@@ -81,6 +111,7 @@ class GraphModel {
 
   StreamObserver& observer_;
   std::function<void()> onDriversChanged_ = [] {};
+  std::function<void()> onShapeChanged_ = [] {};
   bool isComplete_ = false;
   std::map<std::uint32_t, Node> nodes_;
   std::map<std::uint32_t, Properties> clients_;

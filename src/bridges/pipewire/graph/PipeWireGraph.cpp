@@ -228,8 +228,9 @@ class PipeWireGraph::Connection {
       streams_.insert(identifier);
       profiler_->setWanted(true);
     }
-    if (!isOutputStream(properties) && !isSink(properties) && !isSource(properties)) return;
     graph_.model_.nodeAppeared(identifier, properties);
+    // Of others, such as filters, the properties in the registry are enough.
+    if (!isOutputStream(properties) && !isSink(properties) && !isSource(properties)) return;
     bind<BoundNode>(identifier, PW_TYPE_INTERFACE_Node, PW_VERSION_NODE);
   }
 

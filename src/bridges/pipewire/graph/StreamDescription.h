@@ -21,15 +21,17 @@ inline constexpr std::string_view kNodeDriverKey = "node.driver";
 inline constexpr std::string_view kApplicationIDKey = "application.id";
 inline constexpr std::string_view kApplicationBinaryKey = "application.process.binary";
 inline constexpr std::string_view kApplicationNameKey = "application.name";
+inline constexpr std::string_view kApplicationProcessKey = "application.process.id";  // as the process says
+inline constexpr std::string_view kSocketProcessKey = "pipewire.sec.pid";             // as the kernel says
 inline constexpr std::string_view kClientIDKey = "client.id";
 inline constexpr std::string_view kLinkOutputNodeKey = "link.output.node";
 inline constexpr std::string_view kLinkInputNodeKey = "link.input.node";
 
 // All keys above: an adapter must pass on these properties.
-inline constexpr std::array kUsedKeys = {kMediaClassKey,      kMediaRoleKey,         kNodeNameKey,
-                                         kNodeDescriptionKey, kNodeNickKey,          kNodeDriverKey,
-                                         kApplicationIDKey,   kApplicationBinaryKey, kApplicationNameKey,
-                                         kClientIDKey,        kLinkOutputNodeKey,    kLinkInputNodeKey};
+inline constexpr std::array kUsedKeys = {
+    kMediaClassKey,    kMediaRoleKey,     kNodeNameKey,          kNodeDescriptionKey, kNodeNickKey,
+    kNodeDriverKey,    kApplicationIDKey, kApplicationBinaryKey, kApplicationNameKey, kApplicationProcessKey,
+    kSocketProcessKey, kClientIDKey,      kLinkOutputNodeKey,    kLinkInputNodeKey};
 
 // Empty when the property is missing.
 std::string_view propertyOf(const Properties& properties, std::string_view key);

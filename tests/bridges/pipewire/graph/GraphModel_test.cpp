@@ -250,5 +250,44 @@ TEST_F(GraphModelTest, ShortensTextsOfTheGraph) {
   EXPECT_EQ(model.driverAt(kSpeaker)->name.size(), 256U);
 }
 
+TEST_F(GraphModelTest, KnowsWhoseANodeIs) {
+  model.clientDescribed(kClient, properties({{kApplicationBinaryKey, "player"},
+                                             {kApplicationProcessKey, "77"},
+                                             {kSocketProcessKey, "78"}}));
+  model.nodeAppeared(60, properties({{kNodeNameKey, "filter"}, {kClientIDKey, "30"}}));
+  const NodeOwner owner = model.ownerOf(60);
+  EXPECT_EQ(owner.name, "filter");
+  EXPECT_EQ(owner.application, "player");
+  EXPECT_EQ(owner.process, 77);
+  EXPECT_EQ(owner.computingProcess, 78);
+  EXPECT_FALSE(owner.isOutputStream);
+  EXPECT_EQ(model.ownerOf(61).name, "");
+}
+
+TEST_F(GraphModelTest, KnowsNoProcessWhenAClientGivesNonsenseForIt) {
+  model.clientDescribed(kClient, properties({{kApplicationProcessKey, "-5"}, {kSocketProcessKey, "1e9"}}));
+  model.nodeAppeared(60, properties({{kClientIDKey, "30"}}));
+  EXPECT_EQ(model.ownerOf(60).process, 0);
+  EXPECT_EQ(model.ownerOf(60).computingProcess, 0);
+}
+
+TEST_F(GraphModelTest, HasEachPairOfLinkedNodesOnceAndTellsOfChanges) {
+  int changes = 0;
+  model.watchShape([&] { ++changes; });
+  model.linkAppeared(70, 2, 3);
+  model.linkAppeared(71, 2, 3);
+  model.linkAppeared(72, 1, 2);
+  EXPECT_THAT(model.nodeLinks(), ElementsAre(NodeLink{1, 2}, NodeLink{2, 3}));
+  EXPECT_EQ(changes, 3);
+  model.removed(71);
+  EXPECT_THAT(model.nodeLinks(), ElementsAre(NodeLink{1, 2}, NodeLink{2, 3}));
+  model.removed(70);
+  EXPECT_THAT(model.nodeLinks(), ElementsAre(NodeLink{1, 2}));
+  EXPECT_EQ(changes, 5);
+  addSink(kSpeaker, "Speaker");
+  model.removed(kSpeaker);
+  EXPECT_EQ(changes, 7);
+}
+
 }  // namespace
 }  // namespace tonewerk
