@@ -9,8 +9,13 @@
 #include <cstring>
 #include <memory>
 #include <spa/pod/pod.h>
+#include <string>
+#include <vector>
 
 #include "FuzzInput.h"
+#include "bridges/pipewire/glitches/GlitchCyclesText.h"
+#include "bridges/pipewire/glitches/GlitchJudge.h"
+#include "bridges/pipewire/glitches/GlitchWatch.h"
 #include "bridges/pipewire/graph/PipeWireParams.h"
 #include "bridges/pipewire/graph/PipeWireProfile.h"
 #include "values/Utf8.h"
@@ -18,8 +23,42 @@
 namespace tonewerk {
 namespace {
 
+// Follows the cycles of any numbers and times, and judges what it finds.
+void watch(const std::vector<ProfiledCycle>& cycles) {
+  std::size_t judged = 0;
+  std::unique_ptr<GlitchWatch> watch;
+  const auto judge = [&](const GlitchSpan& span) {
+    expect(span.first <= span.firstNew && span.firstNew <= span.last);
+    expect(span.last < watch->history().size());
+    if (++judged > 8) return;
+    GlitchEvidence evidence;
+    for (std::size_t i = span.first; i < watch->history().size(); ++i) {
+      const auto nodes = watch->history().nodes(i);
+      evidence.cycles.push_back({watch->history().cycle(i), {nodes.begin(), nodes.end()}});
+      for (const KeptNode& node : nodes) {
+        if (const auto usual = watch->usualOf(node.node)) evidence.usual.emplace(node.node, *usual);
+      }
+    }
+    evidence.last = span.last - span.first;
+    evidence.deviceXruns = span.deviceXruns;
+    const Verdict verdict = judgeGlitch(evidence);
+    expect(verdict.confidence >= 0.0 && verdict.confidence <= 1.0 && !verdict.reason.empty());
+    expect(std::isfinite(verdict.overMilliseconds) && verdict.overMilliseconds >= 0.0);
+    expect(glitchCyclesText(evidence, [](std::uint32_t) { return std::string("p"); }).size() <=
+           kMaxCyclesBytes);
+  };
+  watch = std::make_unique<GlitchWatch>(judge);
+  for (const ProfiledCycle& cycle : cycles) watch->add(cycle);
+  watch->flush();
+}
+
 void read(const spa_pod& pod) {
-  for (const ProfiledCycle& cycle : cyclesOf(pod)) {
+  const std::vector<ProfiledCycle> cycles = cyclesOf(pod);
+  watch(cycles);
+  for (const ProfiledCycle& cycle : cycles) {
+    for (const ProfiledFollower& follower : cycle.followers) {
+      expect(follower.hasFinished == (follower.times.stage == NodeTimes::kFinished));
+    }
     expect(cycle.period.count() >= 0 && cycle.frames > 0);
     expect(!cycle.processing || (cycle.begin && cycle.processing->count() >= 0));
   }

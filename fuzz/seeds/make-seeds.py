@@ -112,9 +112,20 @@ def choice(kind, child, *values):
     return pod(CHOICE, struct.pack("<IIII", kind, 0, 4, child) + b"".join(values))
 
 
-def node(number, xruns):
-    return structure(integer(number), text("node"), wide(900), wide(1000), wide(1100), wide(3000), integer(3),
+def node(number, xruns, signal=1000, awake=1100, finish=3000, status=3):
+    return structure(integer(number), text("node"), wide(900), wide(signal), wide(awake), wide(finish), integer(status),
                      fraction(1024, 48000), *([] if xruns is None else [integer(xruns)]))
+
+
+# A node that finishes, does not wake, does not finish and finishes two cycles at once, in cycles of 10 ms.
+def glitch(cycle, status, awake, finish):
+    begin = 10_000_000 * cycle
+    clock = structure(integer(0), integer(7), text("clock"), wide(begin), fraction(1, 48000), wide(480 * cycle), wide(480))
+    ends = 20_000_000 if status < 3 else 500_000
+    return thing(0x4000A, 0, [
+        (0x10001, INFO), (0x10002, clock), (0x10003, node(36, None, begin, begin, begin + ends)),
+        (0x20001, node(40, None, begin + 1000, begin + 2000, begin + 3000)),
+        (0x20001, node(41, None, begin + 4000, begin + awake, begin + finish, status))])
 
 
 INFO = structure(wide(12), real(0.25), real(0.25), real(0.25), integer(2))
@@ -124,6 +135,9 @@ CHANNELS = pod(ARRAY, struct.pack("<IIff", 4, FLOAT, 0.5, 0.25))
 FORMAT = [(1, pod(ID, struct.pack("<I", 1))), (2, pod(ID, struct.pack("<I", 1)))]
 write("PipeWirePod", {
     "profile": structure(CYCLE, CYCLE),
+    "glitch": structure(*(glitch(*cycle) for cycle in [
+        (1, 3, 5000, 6000), (2, 3, 5000, 6000), (3, 2, 5000, -9000), (4, 1, 0, -9000), (5, 3, -9000, 2_000_000),
+        (6, 3, 5000, 6000)])),
     "no-clock": structure(thing(0x4000A, 0, [(0x10001, INFO), (0x10003, node(36, 1))])),
     "volume": thing(0x40002, 2, [(0x10004, pod(BOOL, struct.pack("<i", 1))), (0x10003, real(0.5)), (0x10008, CHANNELS)]),
     "format": thing(0x40003, 4, FORMAT + [(0x10001, pod(ID, struct.pack("<I", 0x11B))), (0x10003, integer(48000)),
