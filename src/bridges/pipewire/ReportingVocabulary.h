@@ -40,6 +40,26 @@ inline constexpr std::string_view kBufferFramesKey = "smallest_buffer_frame_size
 inline constexpr std::string_view kCycleKey = "io_cycle";
 inline constexpr std::string_view kXrunCountKey = "xrun_count";
 
+// Keys of an overload's verdict.
+inline constexpr std::string_view kGlitchIDKey = "glitch_id";
+inline constexpr std::string_view kGlitchCauseKey = "glitch_cause";
+inline constexpr std::string_view kGlitchFirstCauseKey = "glitch_first_cause";
+inline constexpr std::string_view kGlitchConfidenceKey = "glitch_confidence";  // 0 to 1
+inline constexpr std::string_view kGlitchCulpritApplicationKey = "glitch_culprit_application";
+inline constexpr std::string_view kGlitchCulpritProcessKey = "glitch_culprit_process";
+inline constexpr std::string_view kGlitchCulpritPIDKey = "glitch_culprit_pid";
+inline constexpr std::string_view kGlitchCulpritNodeKey = "glitch_culprit_node";
+inline constexpr std::string_view kGlitchNodeKey = "glitch_node";
+inline constexpr std::string_view kGlitchDeviceKey = "glitch_device";
+inline constexpr std::string_view kGlitchChainKey = "glitch_chain";
+inline constexpr std::string_view kGlitchOverKey = "glitch_over_ms";
+inline constexpr std::string_view kGlitchPeriodKey = "glitch_period_ms";
+inline constexpr std::string_view kGlitchQuantumKey = "glitch_quantum";  // frames
+inline constexpr std::string_view kGlitchRateKey = "glitch_rate";        // Hz
+inline constexpr std::string_view kGlitchLostKey = "glitch_lost_ms";
+inline constexpr std::string_view kGlitchReasonKey = "glitch_reason";
+inline constexpr std::string_view kGlitchCyclesKey = "glitch_cycles";  // JSON
+
 // Value of kIssueTypeKey. The daemon counts these messages in its summary of a session.
 inline constexpr std::string_view kOverloadIssue = "overload";
 

@@ -29,7 +29,7 @@ void StreamReporter::update(const StreamState& state) {
 
 void StreamReporter::overloaded(const Overload& overload) {
   overloads_.add(overload);
-  if (reporterID_ != 0) sendOverload(overloads_.take(clock_.monotonic()));
+  if (reporterID_ != 0) sendOverloads(overloads_.take(clock_.monotonic()));
 }
 
 void StreamReporter::restart() {
@@ -54,7 +54,7 @@ void StreamReporter::end() {
   sendHeldChange();
   playback_.running = false;
   if (reporterID_ == 0) beginSession();
-  sendOverload(overloads_.takeRest());
+  sendOverloads(overloads_.takeRest());
   ValueMap message = messageFor(clock_.now());
   message.set(kSessionDurationKey, std::chrono::duration<double>(clock_.monotonic() - appearedAt_).count());
   sink_.message(reporterID_, kOutputCategory, kStopType, std::move(message));
@@ -81,7 +81,7 @@ void StreamReporter::deadlineReached() {
   const std::chrono::nanoseconds now = clock_.monotonic();
   if (reporterID_ == 0 && now >= deadline()) beginSession();
   if (held_ && now >= changeDeadline()) sendHeldChange();
-  if (reporterID_ != 0) sendOverload(overloads_.take(now));
+  if (reporterID_ != 0) sendOverloads(overloads_.take(now));
 }
 
 // The playback keeps its values where the new state has none: a pause removes the format and the links, but
@@ -123,14 +123,21 @@ void StreamReporter::sendState(double time) {
   sink_.message(reporterID_, kOutputCategory, kGenericType, messageFor(time));
 }
 
-void StreamReporter::sendOverload(const std::optional<Overload>& overload) {
-  if (!overload) return;
-  sink_.message(reporterID_, kIOCategory, kErrorType,
-                {{kTimestampKey, overload->time},
-                 {kIssueTypeKey, kOverloadIssue},
-                 {kBufferFramesKey, overload->frames},
-                 {kCycleKey, overload->cycle},
-                 {kXrunCountKey, overload->xruns}});
+void StreamReporter::sendOverloads(const std::vector<Overload>& overloads) {
+  for (const Overload& overload : overloads) {
+    ValueMap message{{kTimestampKey, overload.time},
+                     {kIssueTypeKey, kOverloadIssue},
+                     {kBufferFramesKey, overload.frames},
+                     {kCycleKey, overload.cycle},
+                     {kXrunCountKey, overload.xruns}};
+    const OverloadVerdict& verdict = overload.verdict;
+    if (!verdict.key.empty()) {
+      message.set(kGlitchOverKey, verdict.overMilliseconds);
+      message.set(kGlitchLostKey, verdict.lostMilliseconds);
+      message.merge(verdict.values);
+    }
+    sink_.message(reporterID_, kIOCategory, kErrorType, std::move(message));
+  }
 }
 
 void StreamReporter::beginSession() {

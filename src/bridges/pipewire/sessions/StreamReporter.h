@@ -5,6 +5,7 @@
 #include <cstdint>
 #include <optional>
 #include <string>
+#include <vector>
 
 #include "bridges/pipewire/graph/StreamState.h"
 #include "bridges/pipewire/sessions/OverloadPacer.h"
@@ -35,7 +36,7 @@ namespace tonewerk {
 // A pause or an end is sent at once, after a held change.
 //
 // An overload is sent at once, under a category and type of its own. Later ones are sent at most once a
-// second.
+// second, those of different culprits in different messages.
 //
 // Used on one thread, which calls deadlineReached() when the time deadline() has come.
 class StreamReporter {
@@ -83,7 +84,7 @@ class StreamReporter {
   void holdChange();
   void sendHeldChange();
   void sendState(double time);
-  void sendOverload(const std::optional<Overload>& overload);
+  void sendOverloads(const std::vector<Overload>& overloads);
   void beginSession();
   ValueMap messageFor(double time) const;
 
