@@ -30,7 +30,7 @@ void DriverStatistics::count(const DriverNode& driver, const ProfiledCycle& cycl
   if (found != drivers_.end()) found->second.count(cycle, xruns);
 }
 
-ValueMap DriverStatistics::channelsOf(std::string_view driverName) const {
+ValueMap DriverStatistics::channelsOf(std::string_view driverName, const std::vector<NodeLoad>& nodes) const {
   ValueArray channels;
   for (const DriverNode::Direction direction : {DriverNode::kSink, DriverNode::kSource}) {
     totals_[direction].describe(channels, groupOf(direction), {});
@@ -38,6 +38,7 @@ ValueMap DriverStatistics::channelsOf(std::string_view driverName) const {
   for (const auto& [driver, statistics] : drivers_) {
     statistics.describe(channels, groupOf(driver.direction), driver.name);
   }
+  appendNodeChannels(channels, nodes);
   return {{"driver", driverName}, {"channels", std::move(channels)}};
 }
 

@@ -6,8 +6,10 @@
 #include <map>
 #include <set>
 #include <string_view>
+#include <vector>
 
 #include "bridges/pipewire/drivers/CycleStatistics.h"
+#include "bridges/pipewire/drivers/NodeChannels.h"
 #include "bridges/pipewire/graph/DriverNode.h"
 #include "values/ValueMap.h"
 
@@ -29,8 +31,8 @@ class DriverStatistics {
   void setPresent(const std::set<DriverNode>& drivers);
   void count(const DriverNode& driver, const ProfiledCycle& cycle, const CycleXruns& xruns);
 
-  // The whole content of a published file.
-  ValueMap channelsOf(std::string_view driverName) const;
+  // The whole content of a published file, with the channels of these nodes.
+  ValueMap channelsOf(std::string_view driverName, const std::vector<NodeLoad>& nodes = {}) const;
 
  private:
   [[nodiscard]] bool makeRoom(const std::set<DriverNode>& present);
