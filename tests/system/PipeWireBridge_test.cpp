@@ -238,7 +238,8 @@ TEST_F(PipeWireBridgeTest, ReportsOverloadsOfAStreamThatHangs) {
   // The driver continues without the stopped player.
   player.signal(SIGSTOP);
   const std::int64_t before = counted("Incomplete Cycles");
-  ASSERT_TRUE(waitUntil([&] { return counted("Incomplete Cycles") > before; }));
+  // Dozens of cycles, so that nothing but the stop can be the cause.
+  ASSERT_TRUE(waitUntil([&] { return counted("Incomplete Cycles") > before + 30; }));
   player.signal(SIGCONT);
 
   const std::string name = "com.orvane.longformaudio.IO.Error";
@@ -249,6 +250,20 @@ TEST_F(PipeWireBridgeTest, ReportsOverloadsOfAStreamThatHangs) {
   EXPECT_GT(overload.at("smallest_buffer_frame_size"), 0);
   EXPECT_GT(overload.at("io_cycle"), 0);
   EXPECT_GT(overload.at("xrun_count"), 0);
+  // The machine may be busy, so other overloads may come before that of the stop.
+  ASSERT_TRUE(waitUntil([&] {
+    for (const nlohmann::json& event : eventsOf(daemon.storePath(), name)) {
+      if (event.value("glitch_cause", "") == "stuck") return true;
+    }
+    return false;
+  }));
+  for (const nlohmann::json& event : eventsOf(daemon.storePath(), name)) {
+    if (event.value("glitch_cause", "") != "stuck") continue;
+    EXPECT_EQ(event.at("glitch_culprit_node"), kPlayer);
+    EXPECT_EQ(event.at("glitch_culprit_application"), "pw-cat");
+    EXPECT_EQ(event.at("glitch_device"), "speaker");
+    EXPECT_FALSE(nlohmann::json::parse(event.at("glitch_cycles").get<std::string>(), nullptr, false).empty());
+  }
   stopPlaying();
 
   const std::string summary = "com.orvane.longformaudio.Session_Generic.Summary";

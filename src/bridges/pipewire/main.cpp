@@ -8,6 +8,8 @@
 #include <unistd.h>
 
 #include "bridges/pipewire/drivers/DriverReports.h"
+#include "bridges/pipewire/drivers/KernelFacts.h"
+#include "bridges/pipewire/drivers/LeavingStreams.h"
 #include "bridges/pipewire/drivers/PublishingSessionSink.h"
 #include "bridges/pipewire/graph/PipeWireGraph.h"
 #include "bridges/pipewire/sessions/DaemonLink.h"
@@ -38,12 +40,22 @@ int runBridge(const Console& console) {
   // The bridges of several users may report to one daemon, so each publishes a file of its own.
   const std::string user = std::to_string(getuid());
   DriverStatistics statistics;
-  ChannelPublisher publisher(*loop, clock, console, "tw-pipewire-" + user + ".json",
-                             [&] { return statistics.channelsOf("PipeWire<" + user + ">"); });
+  const GlitchReports* nodes = nullptr;
+  ChannelPublisher publisher(*loop, clock, console, "tw-pipewire-" + user + ".json", [&] {
+    return statistics.channelsOf("PipeWire<" + user + ">",
+                                 nodes == nullptr ? std::vector<NodeLoad>() : nodes->loads());
+  });
   PublishingSessionSink sessions(daemon, publisher);
   StreamReports reports(sessions, clock, identifiers, *loop);
-  GraphModel model(reports);
-  DriverReports drivers(model, statistics, reports, publisher, clock);
+  LeavingStreams leaving(reports);
+  GraphModel model(leaving);
+  const LinuxKernelCalls kernel;
+  KernelSampler sampler(kernel);
+  KernelFacts facts(*loop, clock, sampler);
+  GlitchReports glitches(model, reports, facts, clock);
+  leaving.tell(&glitches);
+  nodes = &glitches;
+  DriverReports drivers(model, statistics, glitches, publisher);
   {
     PipeWireGraph graph(*loop, model, drivers, console);
     const auto onConnected = [&](DaemonLink::Connection connection) {
@@ -66,6 +78,7 @@ int runBridge(const Console& console) {
   }
   // The graph is no longer watched, so the sessions of streams that still play end here.
   model.clear();
+  leaving.tell(nullptr);
   if (daemon.isConnected() && !daemon.finish(kFinishTimeout)) console.say("the daemon took not everything");
   // After finish(), because the daemon reads the channels when a session stops.
   publisher.withdraw();

@@ -5,23 +5,22 @@
 
 #include "bridges/pipewire/drivers/ChannelPublisher.h"
 #include "bridges/pipewire/drivers/DriverStatistics.h"
+#include "bridges/pipewire/drivers/GlitchReports.h"
 #include "bridges/pipewire/drivers/XrunWatch.h"
 #include "bridges/pipewire/graph/GraphModel.h"
 #include "bridges/pipewire/graph/ProfileObserver.h"
-#include "bridges/pipewire/sessions/StreamReports.h"
-#include "platform/Clock.h"
 
 namespace tonewerk {
 
-// Adds up the profiler's data on the graph's drivers, keeps the published channels up to date, and reports
-// overloads to the streams. A stream gets its own overloads and those of the driver that serves it.
+// Adds up the profiler's data on the graph's drivers, keeps the published channels up to date, and has
+// overloads judged and reported.
 //
 // Used on the loop's thread only.
 class DriverReports final : public ProfileObserver {
  public:
   // All arguments outlive this object. It watches the drivers of `model` until it is destroyed.
-  DriverReports(GraphModel& model, DriverStatistics& statistics, StreamReports& streams,
-                ChannelPublisher& publisher, const Clock& clock);
+  DriverReports(GraphModel& model, DriverStatistics& statistics, GlitchReports& glitches,
+                ChannelPublisher& publisher);
   DriverReports(const DriverReports&) = delete;
   DriverReports& operator=(const DriverReports&) = delete;
   ~DriverReports() override;
@@ -30,13 +29,11 @@ class DriverReports final : public ProfileObserver {
 
  private:
   void driversChanged();
-  double wallTimeOf(const ProfiledCycle& cycle) const;
 
   GraphModel& model_;
   DriverStatistics& statistics_;
-  StreamReports& streams_;
+  GlitchReports& glitches_;
   ChannelPublisher& publisher_;
-  const Clock& clock_;
   XrunWatch xruns_;
 };
 
