@@ -3,14 +3,18 @@
 // Reads the input as what the kernel says about processes, sound cards and temperatures: texts with their
 // lengths before them, one for each file.
 #include <array>
+#include <chrono>
 #include <cstddef>
 #include <cstdint>
 #include <filesystem>
 #include <fstream>
 #include <optional>
+#include <sched.h>
 #include <string>
 
 #include "FuzzInput.h"
+#include "bridges/pipewire/kernel/KernelCalls.h"
+#include "bridges/pipewire/kernel/KernelSampler.h"
 #include "platform/Log.h"
 #include "platform/linux/channels/KernelSoundChannels.h"
 #include "platform/linux/diagnostics/collectors/LoadCollector.h"
@@ -44,7 +48,13 @@ constexpr std::array kFiles = {"proc/1/stat",
                                "thermal/thermal_zone0/trip_point_0_type",
                                "proc/1/comm",
                                "proc/self/status",
-                               "proc/loadavg"};
+                               "proc/loadavg",
+                               "proc/1/task/1/stat",
+                               "proc/1/task/1/schedstat",
+                               "proc/pressure/cpu",
+                               "sys/devices/system/cpu/cpu0/cpufreq/cpuinfo_max_freq",
+                               "sys/devices/system/cpu/cpu0/cpufreq/scaling_cur_freq",
+                               "sys/devices/system/cpu/cpu0/thermal_throttle/core_throttle_count"};
 
 class KernelFiles {
  public:
@@ -88,13 +98,57 @@ void readSoundCards(const std::string& root) {
   expect(isUtf8(SoundStatusCollector(root + "/proc/asound").collect().text));
 }
 
+// Each thread is a real-time one.
+class RealTimeKernel final : public KernelCalls {
+ public:
+  ClockTimes clocks() const override { return {time_, time_, time_}; }
+  int policyOf(std::int32_t) const override { return SCHED_FIFO; }
+  void advance() { time_ += KernelSampler::kInterval; }
+
+ private:
+  std::chrono::nanoseconds time_{0};
+};
+
+// Reads the same files before and after they change.
+class SampledKernel {
+ public:
+  explicit SampledKernel(const KernelFiles& files)
+      : sampler_(kernel_, {files.path("proc"), files.path("sys")}) {
+    const std::array<std::int32_t, 1> processes = {1};
+    sampler_.watch(processes);
+  }
+  void sample() {
+    kernel_.advance();
+    sampler_.sample();
+  }
+  void check() const {
+    const std::chrono::nanoseconds begin(0);
+    const std::chrono::nanoseconds end = kernel_.clocks().monotonic;
+    for (const ThreadMoment& moment : sampler_.threadMoments(1, begin, end)) {
+      expect(moment.ran.count() >= 0 && moment.waited.count() >= 0 && moment.interval.count() >= 0);
+    }
+    for (const MachineMoment& moment : sampler_.machineMoments(begin, end)) {
+      expect(moment.cpuStall.count() >= 0 && moment.frequencyPerMille <= 1000 && moment.hogCount <= 1);
+    }
+  }
+
+ private:
+  RealTimeKernel kernel_;
+  KernelSampler sampler_;
+};
+
 void read(FuzzInput input) {
   static const KernelFiles files;
   files.write(input);
+  SampledKernel kernel(files);
+  kernel.sample();
   readProcesses(files.path("proc"));
   readSoundCards(files.path(""));
   const int level = thermalLevelOf(files.path("thermal"));
   expect(level >= 0 && level <= 3);
+  files.write(input);
+  kernel.sample();
+  kernel.check();
 }
 
 }  // namespace

@@ -53,8 +53,18 @@ PARAMETERS = "access: RW_INTERLEAVED\nformat: S16_LE\nrate: 48000 (48000/1)\n"
 POWER = ["active\n", "61234\n", "5321000\n"]
 THERMAL = ["enabled\n", "65000\n", "60000\n", "passive\n"]
 OWN = ["player\n", STATUS, "0.10 0.20 0.30 1/100 4711\n"]
+USUAL = [STAT, STATUS, MEMINFO, CPU, "PCH\n", PCM, PARAMETERS, *POWER, *THERMAL, *OWN]
+
+
+def thread(milliseconds):
+    zeros = " 0" * 26
+    return [f"1 (data-loop.0) S 1 1 1 0 -1 64 7 0 {milliseconds}{zeros} 1 20 1\n", f"{milliseconds}000000 5000000 9\n",
+            f"some avg10=0.00 avg60=0.00 avg300=0.00 total={milliseconds}000\n", "4000000\n", "3000000\n", f"{milliseconds}\n"]
+
+
 write("ProcFiles", {
-    "usual": b"".join(map(long, [STAT, STATUS, MEMINFO, CPU, "PCH\n", PCM, PARAMETERS, *POWER, *THERMAL, *OWN])),
+    "usual": b"".join(map(long, USUAL)),
+    "sampled": b"".join(map(long, [*USUAL, *thread(20), *USUAL, *thread(90)])),
     "closed": b"".join(map(long, [STAT, "Name:\tkthreadd\n", MEMINFO, "cpu\n", "USB\n", "closed\n", "closed\n", "suspended\n"])),
     "no-stamps": b"".join(map(long, ["1 (a", STATUS, "", CPU, "\n", "state: RUNNING\ndelay : -1\nhw_ptr : 9223372036854775807\n",
                                      "rate: 1\n", "error\n", "-1\n", "x\n", "disabled\n", "-1\n", "9999999999\n", "hot\n"])),

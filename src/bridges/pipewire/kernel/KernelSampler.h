@@ -21,8 +21,8 @@ namespace tonewerk {
 // policy. They are looked for when the process is first watched, and again about every second.
 //
 // Files stay open between samples, and a sample allocates nothing unless threads have come or gone. A fact
-// that cannot be read (a process that ended or belongs to somebody else, a kernel without the file) is absent;
-// nothing here fails. Used on one thread. Numbers are bounded: see the limits below.
+// that cannot be read (a process that ended or belongs to somebody else, a kernel without the file) is
+// absent; nothing here fails. Used on one thread. Numbers are bounded: see the limits below.
 class KernelSampler {
  public:
   static constexpr std::chrono::milliseconds kInterval{100};  // between calls of sample()
