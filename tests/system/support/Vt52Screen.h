@@ -8,8 +8,8 @@
 
 namespace tonewerk {
 
-// What a terminal of the type vt52 shows after a program's output. That terminal has few controls, so a test can
-// follow a program that writes only what changes on the screen.
+// What a terminal of the type vt52 shows after a program's output. That terminal has few controls, so a test
+// can follow a program that writes only what changes on the screen.
 class Vt52Screen {
  public:
   Vt52Screen(std::size_t columns, std::size_t rows);

@@ -8,9 +8,9 @@
 namespace tonewerk {
 
 // The SQL by which StoreReader asks for the rows that pass a filter, oldest first. Parameter 1 is
-// kStoreNamesPerRow. Parameters 2 to 10 are the filter's afterId, name, since, until, limit, application, device,
-// service and session, of which the optional ones are there only when they have a value. The columns are the
-// members of the row's type.
+// kStoreNamesPerRow. Parameters 2 to 10 are the filter's afterId, name, since, until, limit, application,
+// device, service and session, of which the optional ones are there only when they have a value. The columns
+// are the members of the row's type.
 
 // `knowsSessions`: whether the file's rows do.
 std::string messageQuery(const EventFilter& filter, bool knowsSessions);

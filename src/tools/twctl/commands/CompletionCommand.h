@@ -17,9 +17,9 @@ namespace tonewerk {
 //
 //   twctl __complete SHELL SECONDS WORD...
 //
-// SHELL is "bash", whose words are as they were typed, or another one, whose words have no quotes any more. The
-// words are those after the program's name; the last one is to be completed. SECONDS bounds how long things are
-// looked up.
+// SHELL is "bash", whose words are as they were typed, or another one, whose words have no quotes any more.
+// The words are those after the program's name; the last one is to be completed. SECONDS bounds how long
+// things are looked up.
 struct CompletionQuestion {
   std::vector<std::string> words;
   double seconds = 1.0;
@@ -35,8 +35,8 @@ struct CompletionQuestion {
 //   recordings      complete the name of a recording
 //   command N       complete the command line that begins after N words, the program's name included
 //
-// After a line of words, each is alone or followed by a tab and its description. When the daemon or a file takes longer
-// than the question allows, the process ends at once, with what it knew. `app` has all commands.
+// After a line of words, each is alone or followed by a tab and its description. When the daemon or a file
+// takes longer than the question allows, the process ends at once, with what it knew. `app` has all commands.
 void answerCompletion(const CLI::App& app, const Tool& tool, const CompletionQuestion& question);
 
 }  // namespace tonewerk

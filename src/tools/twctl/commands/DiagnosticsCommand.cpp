@@ -56,8 +56,8 @@ struct Shown {
   std::optional<DiagnosticSummary> summary;
 };
 
-// Those of the time and the number that are asked for, oldest first. A time leaves out items whose own time is
-// not known.
+// Those of the time and the number that are asked for, oldest first. A time leaves out items whose own time
+// is not known.
 std::vector<Shown> chosen(const DiagnosticsDirectory& directory, const DiagnosticsCommand& command,
                           const TimeRangeOptions::Range& range) {
   std::vector<Shown> all;

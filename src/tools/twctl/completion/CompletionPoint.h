@@ -37,12 +37,12 @@ struct CompletionPoint {
   bool systemWide = false;              // --system was given
 };
 
-// `words` are those after the program's name; the last one, which may be empty, is the one to complete. `app` has
-// all commands with their options.
+// `words` are those after the program's name; the last one, which may be empty, is the one to complete. `app`
+// has all commands with their options.
 CompletionPoint completionPointOf(const CLI::App& app, const std::vector<std::string>& words);
 
-// The place in `words`, which are complete, of another program's command line: what follows a command that takes one, such
-// as sandbox, with or without "--" before it. None when there is none.
+// The place in `words`, which are complete, of another program's command line: what follows a command that
+// takes one, such as sandbox, with or without "--" before it. None when there is none.
 std::optional<std::size_t> foreignCommandIn(const CLI::App& app, const std::vector<std::string>& words);
 
 // The commands, options or choices that the tree itself knows for this point, in its order, with their

@@ -310,7 +310,8 @@ Candidates captures(const Question& question) { return diagnostics(question, Dia
 Candidates drafts(const Question& question) { return diagnostics(question, DiagnosticKind::kIssueDraft); }
 Candidates whirlcaps(const Question& question) { return diagnostics(question, DiagnosticKind::kWhirlcap); }
 
-// What an option, or the argument of a command, can be. The first line that fits counts; an empty command fits all.
+// What an option, or the argument of a command, can be. The first line that fits counts; an empty command
+// fits all.
 struct Entry {
   std::string_view command;
   std::string_view name;

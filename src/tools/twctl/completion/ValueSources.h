@@ -23,8 +23,8 @@ struct ValueSources {
   Source lookup = {};            // asks the daemon, or reads its files, and may take long; null for none
 };
 
-// `tool` gives the directories and the daemon's socket; nothing is printed to it. The candidates are those that begin with
-// the point's word, in no particular order, and only such as isOfferable().
+// `tool` gives the directories and the daemon's socket; nothing is printed to it. The candidates are those
+// that begin with the point's word, in no particular order, and only such as isOfferable().
 ValueSources valueSourcesFor(const CompletionPoint& point, const Tool& tool);
 
 }  // namespace tonewerk

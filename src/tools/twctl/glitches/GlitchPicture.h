@@ -13,8 +13,8 @@ namespace tonewerk {
 // one sees who came when, how long it took, and who went beyond the end of the period.
 //
 //   the glitch's cycle, of 5.33 ms
-//     studio        ██████████████████████|▓▓▓▓▓▓▓▓▓▓▓  8.4 ms
-//     player                              |           ░ not woken
+//     studio        ████████████|▓▓▓▓▓▓  8.4 ms
+//     player                    |      ░ not woken
 class GlitchPicture {
  public:
   struct Look {

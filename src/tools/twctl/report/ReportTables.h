@@ -22,8 +22,8 @@ namespace tonewerk {
 //   heard    the input stretches: session, device, mode, started, ended, seconds, misplaced
 //   trouble  the issues: at, session, application, kind, node, duration_seconds, buffer_frames
 //   crackled the glitches, each once for all its sessions: id (of an event), at (when it happened), cause (of
-//            the first in the chain), culprit (an application, a process, or "the device"), process, heard (an
-//            application), sessions, reason, over_ms, lost_ms, times, judged (0, 1). Texts are cut.
+//            the first in the chain), culprit (an application, a process, or "the device"), process, heard
+//            (an application), sessions, reason, over_ms, lost_ms, times, judged (0, 1). Texts are cut.
 //            Empty for a store without that view
 //   felt     the haptics: at, application, leaked (0, 1), seconds
 //

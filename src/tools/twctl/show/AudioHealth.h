@@ -33,8 +33,8 @@ struct AudioHealth {
   std::vector<NodeHealth> nodes;      // by name
 };
 
-// Reads the health of the audio from driver channels: "Processing Time" and "Xruns" of devices in the groups Tx and
-// Rx, and the group Nodes. docs/driver-channels.md and docs/pipewire-bridge.md describe them.
+// Reads the health of the audio from driver channels: "Processing Time" and "Xruns" of devices in the groups
+// Tx and Rx, and the group Nodes. docs/driver-channels.md and docs/pipewire-bridge.md describe them.
 class AudioHealthReader {
  public:
   // The largest numbers that are shown; publishers are other programs.

@@ -7,8 +7,8 @@ namespace tonewerk {
 
 struct Tool;
 
-// While it exists, what a command prints to a terminal is collected, and goes through a pager as soon as it is
-// longer than the screen:
+// While it exists, what a command prints to a terminal is collected, and goes through a pager as soon as it
+// is longer than the screen:
 //
 //   short   output, then errors                     nothing else is started
 //   long    pager  <--  output as it comes          errors when the pager has ended

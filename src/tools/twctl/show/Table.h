@@ -26,9 +26,9 @@ class Table {
   // Prints the rows that are not printed yet.
   ~Table();
 
-  // Makes lines for people take no more than `width` columns of the terminal, before the first row. Columns that are too wide
-  // are cut, which "…" shows. Where they would have too little left, each row is printed as a block of
-  // "column  value" with whole values, and an empty line follows it.
+  // Makes lines for people take no more than `width` columns of the terminal, before the first row. Columns
+  // that are too wide are cut, which "…" shows. Where they would have too little left, each row is
+  // printed as a block of "column  value" with whole values, and an empty line follows it.
   void fit(std::size_t width) { width_ = width; }
   // Before lines are cut, leaves out columns until they fit: those of these names, from the first one on.
   // Call it before the first row. Objects for programs keep all columns.

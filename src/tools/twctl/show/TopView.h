@@ -40,7 +40,7 @@ struct TopLine {
 //
 //   3 sessions, 12.3 messages a second, 2 overloads
 //   speaker: 34 % of the period, less than 50 % at worst, 2 xruns     one line a device, or how to get them
-//   application        client     msg/s↓  overloads                   the columns that fit, the sorted one with its arrow
+//   application        client     msg/s↓  overloads            the columns that fit, the sorted one marked
 //   org.example.Player player 11  12.3    2
 //   sessions   h help  q quit
 class TopView {

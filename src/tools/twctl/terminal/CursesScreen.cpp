@@ -38,7 +38,8 @@ void useUtf8() {
   if (std::string_view(::nl_langinfo(CODESET)) != "UTF-8") std::setlocale(LC_CTYPE, "C.UTF-8");
 }
 
-// What fits the columns, by the width of each character. Characters that the terminal does not know become '?'.
+// What fits the columns, by the width of each character. Characters that the terminal does not know become
+// '?'.
 std::wstring fitting(const std::string& text, std::size_t columns) {
   std::wstring fitted;
   std::mbstate_t state{};

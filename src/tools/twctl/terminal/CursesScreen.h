@@ -17,8 +17,8 @@ namespace tonewerk {
 // has no UTF-8.
 class CursesScreen {
  public:
-  // The terminal `outDescriptor` shows; `inDescriptor` delivers keys, -1 for none. Nothing is written before the first
-  // page. Null when the variable TERM does not name a terminal on which a page can be shown.
+  // The terminal `outDescriptor` shows; `inDescriptor` delivers keys, -1 for none. Nothing is written before
+  // the first page. Null when the variable TERM does not name a terminal on which a page can be shown.
   static std::unique_ptr<CursesScreen> open(int inDescriptor, int outDescriptor);
   CursesScreen(const CursesScreen&) = delete;
   CursesScreen& operator=(const CursesScreen&) = delete;

@@ -1,7 +1,8 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "tools/twctl/terminal/TerminalKind.h"
 
-// In a source of its own, because term.h has macros with names such as "columns". It needs curses.h before it.
+// In a source of its own, because term.h has macros with names such as "columns". It needs curses.h before
+// it.
 #include <curses.h>
 //
 #include <term.h>
