@@ -22,8 +22,8 @@
 #include "tools/twctl/show/SessionRates.h"
 #include "tools/twctl/show/SinkTable.h"
 #include "tools/twctl/show/TopFrame.h"
+#include "tools/twctl/show/TopView.h"
 #include "values/PrintableText.h"
-#include "values/Utf8.h"
 
 namespace tonewerk {
 namespace {
@@ -56,11 +56,13 @@ void showSessions(const std::vector<ValueMap>& listing) {
   (void)rates.rowsOf(listing, 1.0);
   const std::vector<SessionRow> rows = rates.rowsOf(listing, 2.5);
   expect(rows.size() == listing.size());
-  for (const std::string& line : topFrame(rows, std::nullopt)) expect(isPrintable(line));
+  for (const std::string& line : topFrame(rows, AudioHealth())) expect(isPrintable(line));
+  TopView view;
+  view.update(rows, AudioHealth());
   for (const TerminalSize size : {TerminalSize{1, 1}, TerminalSize{20, 2}, TerminalSize{80, 4}}) {
-    const std::vector<std::string> page = topFrame(rows, size);
+    const std::vector<TopLine> page = view.page(size);
     expect(page.size() <= size.rows);
-    for (const std::string& line : page) expect(isPrintable(line) && utf8Characters(line) <= size.columns);
+    for (const TopLine& line : page) expect(isPrintable(line.text));
   }
   for (const SessionRow& row : rows) expect(nlohmann::json::accept(topObject(row).text()));
 }
