@@ -38,6 +38,7 @@ class SqlOnATerminalTest : public testing::Test {
                           {"XDG_STATE_HOME", directory.path("home")},
                           {"HOME", directory.path("home")},
                           {"TERM", "xterm"},
+                          {"TZ", "UTC0"},
                           {"LC_ALL", "C.UTF-8"}}};
     command.input = terminal.path();
     ASSERT_TRUE(tool.start(command, terminal.path(), directory.path("errors")));
@@ -67,7 +68,7 @@ class SqlOnATerminalTest : public testing::Test {
 TEST_F(SqlOnATerminalTest, SaysWhatItReadsAndRunsQueries) {
   start();
   EXPECT_THAT(terminal.written(),
-              HasSubstr(fixture.file() + ", from 2025-11-20T10:18:00Z to 2025-11-20T10:18:10Z"));
+              HasSubstr(fixture.file() + ", from 2025-11-20 10:18:00Z to 2025-11-20 10:18:10Z"));
   enter("SELECT count(*) AS sessions FROM session;", "sessions\r\n2\r\n");
   enter(".tables", "session  id, application, started_at");
   quit();
