@@ -126,7 +126,7 @@ class CompletionTest(unittest.TestCase):
         self.assertEqual(self.shell("fish").lines("twctl session "), [lines[1]])
 
     def test_descriptions_reach_the_shells(self):
-        self.assertIn("events\tThe analytics events in the store, oldest first", self.shell("fish").lines("twctl ev"))
+        self.assertIn("events\tThe messages in the store, a line each, newest last", self.shell("fish").lines("twctl ev"))
 
     def test_words_in_quotes_are_completed(self):
         for name in SHELLS:

@@ -16,6 +16,7 @@
 #include "platform/Log.h"
 #include "platform/linux/json/NlohmannJsonService.h"
 #include "protocol/Requests.h"
+#include "support/ScopedTimeZone.h"
 #include "support/TemporaryDirectory.h"
 #include "support/memory/MemoryLog.h"
 #include "tools/offline/OfflineReplay.h"
@@ -94,7 +95,9 @@ std::vector<fs::path> recordings() {
   return found;
 }
 
-class ReasonStoriesTest : public testing::TestWithParam<fs::path> {};
+class ReasonStoriesTest : public testing::TestWithParam<fs::path> {
+  ScopedTimeZone zone_{"UTC"};
+};
 
 TEST_P(ReasonStoriesTest, TellsTheExpectedStories) {
   constexpr std::size_t kWidth = 100;

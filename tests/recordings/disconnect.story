@@ -1,5 +1,5 @@
 Session 1: org.example.Player (process unknown, user 1000) for longformaudio, reporter 7.
-It began at 2026-01-01T00:00:00Z and ended at 2026-01-01T00:00:06Z, after 6 s: its client had gone.
+It began at 2026-01-01 00:00:00Z and ended at 2026-01-01 00:00:06Z, after 6 s: its client had gone.
 2 messages, 0 of them redundant; 0 overloads; 0 s active.
 
 Messages, by the seconds since it began
@@ -27,7 +27,7 @@ Input summaries: 0. A stretch of input must be longer than 0.5 s.
 What was forwarded of it is not known: the store does not record sendings by session.
 --------
 Session 2: org.example.Phone (process unknown, user 1000) for telephony, reporter 8.
-It began at 2026-01-01T00:00:00Z and ended at 2026-01-01T00:00:05Z, after 5 s: a new session of the
+It began at 2026-01-01 00:00:00Z and ended at 2026-01-01 00:00:05Z, after 5 s: a new session of the
 same client replaced it.
 1 message, 0 of them redundant; 0 overloads; 0 s active.
 
@@ -39,7 +39,7 @@ No producer looked for stretches.
 What was forwarded of it is not known: the store does not record sendings by session.
 --------
 Session 3: an unknown application (process player, user 1000) for an unknown service, reporter 9.
-It began at 2026-01-01T00:00:01Z and ended at 2026-01-01T00:00:06Z, after 5 s: its client had gone.
+It began at 2026-01-01 00:00:01Z and ended at 2026-01-01 00:00:06Z, after 5 s: its client had gone.
 1 message, 0 of them redundant; 0 overloads; 0 s active.
 
 Messages, by the seconds since it began
@@ -50,7 +50,7 @@ No producer looked for stretches.
 What was forwarded of it is not known: the store does not record sendings by session.
 --------
 Session 4: org.example.Player (process unknown, user 1000) for longformaudio, reporter 7.
-It began at 2026-01-01T00:00:08Z and ended at 2026-01-01T00:00:09Z, after 1 s: a new session of the
+It began at 2026-01-01 00:00:08Z and ended at 2026-01-01 00:00:09Z, after 1 s: a new session of the
 same client replaced it.
 0 messages, 0 of them redundant; 0 overloads; 0 s active.
 
@@ -62,7 +62,7 @@ No producer looked for stretches.
 What was forwarded of it is not known: the store does not record sendings by session.
 --------
 Session 5: an unknown application (process player, user 1000) for an unknown service, reporter 7.
-It began at 2026-01-01T00:00:10Z and ended at 2026-01-01T00:00:12Z, after 2 s: it was stopped.
+It began at 2026-01-01 00:00:10Z and ended at 2026-01-01 00:00:12Z, after 2 s: it was stopped.
 1 message, 0 of them redundant; 0 overloads; 0 s active.
 
 Messages, by the seconds since it began

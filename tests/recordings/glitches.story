@@ -1,5 +1,5 @@
 Session 1: org.example.Player (process unknown, user 1000) for longformaudio, reporter 7.
-It began at 2026-01-01T00:00:00Z and ended at 2026-01-01T00:00:05Z, after 5 s: it was stopped.
+It began at 2026-01-01 00:00:00Z and ended at 2026-01-01 00:00:05Z, after 5 s: it was stopped.
 3 messages, 0 of them redundant; 3 overloads; 0 s active.
 
 Messages, by the seconds since it began
@@ -8,18 +8,14 @@ Messages, by the seconds since it began
   3  +4 s  IO Error: issue_type=overload xrun_count=1
 
 Made by the daemon
-  4  +5 s  Session_Generic Summary: total_active_time=0 active_count=0 overload_count=3
-    average_active_time=0 num_messages=3 num_unique_messages=5
-    num_redundant_messages=18446744073709551614 singleMessageSession=0
-    summaryServiceName=longformaudio thermal_state=Nominal low_power_enabled=0
-    vmInfo_phys_footprint_MiB=8 load_avg_1_min=0 load_avg_5_min=0 load_avg_15_min=0
+  4  +5 s  Session_Generic Summary, which the store does not have
 
 Volume summaries: 0. A stretch of output must be longer than 0.5 s.
-  none: no message said that output began or ended (session_output_running)
+  none: no message said that output began (session_output_running)
 Gather summaries: 0. A stretch of output must be longer than 0.5 s.
-  none: no message said that output began or ended (session_output_running)
+  none: no message said that output began (session_output_running)
 Input summaries: 0. A stretch of input must be longer than 0.5 s.
-  none: no message said that input began or ended (session_input_running)
+  none: no message said that input began (session_input_running)
 
 Issues
   +2 s  overload, buffer of 256 frames; it waited for another, which was first in the chain: late,
@@ -32,25 +28,21 @@ Issues
 What was forwarded of it is not known: the store does not record sendings by session.
 --------
 Session 2: org.example.Studio (process unknown, user 1000) for longformaudio, reporter 8.
-It began at 2026-01-01T00:00:00Z and ended at 2026-01-01T00:00:05Z, after 5 s: it was stopped.
+It began at 2026-01-01 00:00:00Z and ended at 2026-01-01 00:00:05Z, after 5 s: it was stopped.
 1 message, 0 of them redundant; 1 overload; 0 s active.
 
 Messages, by the seconds since it began
   1  +1.99 s  IO Error: issue_type=overload smallest_buffer_frame_size=256 io_cycle=47 xrun_count=1
 
 Made by the daemon
-  2  +5 s  Session_Generic Summary: total_active_time=0 active_count=0 overload_count=1
-    average_active_time=0 num_messages=1 num_unique_messages=3
-    num_redundant_messages=18446744073709551614 singleMessageSession=0
-    summaryServiceName=longformaudio thermal_state=Nominal low_power_enabled=0
-    vmInfo_phys_footprint_MiB=8 load_avg_1_min=0 load_avg_5_min=0 load_avg_15_min=0
+  2  +5 s  Session_Generic Summary, which the store does not have
 
 Volume summaries: 0. A stretch of output must be longer than 0.5 s.
-  none: no message said that output began or ended (session_output_running)
+  none: no message said that output began (session_output_running)
 Gather summaries: 0. A stretch of output must be longer than 0.5 s.
-  none: no message said that output began or ended (session_output_running)
+  none: no message said that output began (session_output_running)
 Input summaries: 0. A stretch of input must be longer than 0.5 s.
-  none: no message said that input began or ended (session_input_running)
+  none: no message said that input began (session_input_running)
 
 Issues
   +2 s  overload, buffer of 256 frames; cause: late, culprit org.example.Studio (studio, 4711), at

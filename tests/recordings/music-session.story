@@ -1,5 +1,6 @@
 Session 1: org.example.Player (process unknown, user 1000) for longformaudio, reporter 1001.
-It began at 2026-01-01T00:00:00.1Z and ended at 2026-01-01T00:00:06.2Z, after 6 s: it was stopped.
+It began at 2026-01-01 00:00:00.100Z and ended at 2026-01-01 00:00:06.200Z, after 6 s: it was
+stopped.
 8 messages, 0 of them redundant; 1 overload; 6 s active.
 
 Messages, by the seconds since it began

@@ -1,5 +1,5 @@
 Session 1: an unknown application (process unknown, user 1000) for standalone, reporter 1.
-It began at 2026-01-01T00:00:00Z and ended at 2026-01-01T00:00:01Z, after 1 s: it was stopped.
+It began at 2026-01-01 00:00:00Z and ended at 2026-01-01 00:00:01Z, after 1 s: it was stopped.
 2 messages, 0 of them redundant; 0 overloads; 0 s active.
 
 Messages, by the seconds since it began

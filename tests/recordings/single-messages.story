@@ -1,5 +1,5 @@
 Session 1: an unknown application (process unknown, user 1000) for standalone, reporter 1.
-It began at 2026-01-01T00:00:01Z and ended at 2026-01-01T00:00:08.5Z, after 7 s: it was stopped.
+It began at 2026-01-01 00:00:01Z and ended at 2026-01-01 00:00:08.500Z, after 7 s: it was stopped.
 2 messages, 0 of them redundant; 0 overloads; 0 s active.
 
 Messages, by the seconds since it began
@@ -11,7 +11,7 @@ No producer looked for stretches.
 What was forwarded of it is not known: the store does not record sendings by session.
 --------
 Session 2: org.example.Player (process unknown, user 1000) for longformaudio, reporter 7.
-It began at 2026-01-01T00:00:04Z and ended at 2026-01-01T00:00:13Z, after 9 s: it was stopped.
+It began at 2026-01-01 00:00:04Z and ended at 2026-01-01 00:00:13Z, after 9 s: it was stopped.
 1 message, 0 of them redundant; 0 overloads; 0 s active.
 
 Messages, by the seconds since it began
@@ -34,7 +34,7 @@ Input summaries: 0. A stretch of input must be longer than 0.5 s.
 What was forwarded of it is not known: the store does not record sendings by session.
 --------
 Session 3: an unknown application (process unknown, user 1000) for standalone, reporter 1.
-It began at 2026-01-01T00:00:14Z and ended at 2026-01-01T00:00:14Z, after 0 s: it was stopped.
+It began at 2026-01-01 00:00:14Z and ended at 2026-01-01 00:00:14Z, after 0 s: it was stopped.
 1 message, 0 of them redundant; 0 overloads; 0 s active.
 
 Messages, by the seconds since it began

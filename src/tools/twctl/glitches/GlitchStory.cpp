@@ -7,6 +7,7 @@
 #include <utility>
 
 #include "tools/twctl/glitches/GlitchAdvice.h"
+#include "tools/twctl/show/LocalTime.h"
 #include "tools/twctl/show/WrappedLines.h"
 
 namespace tonewerk {
@@ -23,7 +24,7 @@ std::string hearer(const GlitchVerdict& verdict) {
 }
 
 std::string timeOf(const GlitchVerdict& verdict) {
-  std::string text = textOf(Date{verdict.at});
+  std::string text = localTime(verdict.at);
   if (verdict.overloads > 1) text += ", " + std::to_string(verdict.overloads) + " times within a second";
   return text;
 }
