@@ -10,7 +10,7 @@
 
 namespace tonewerk {
 
-inline constexpr std::size_t kMaxCyclesBytes = 6 * 1024;
+inline constexpr std::size_t kMaxCyclesBytes = std::size_t{6} * 1024;
 
 // The cycles around a glitch as JSON, oldest first, as many as kMaxCyclesBytes holds; the glitch's own is the
 // last to be left out. Times are microseconds since the begin of the glitch's cycle.

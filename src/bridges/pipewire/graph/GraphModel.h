@@ -43,6 +43,7 @@ struct NodeLink {
   std::uint32_t output = 0;  // the node that the audio comes from
   std::uint32_t input = 0;
 
+  // NOLINTNEXTLINE(modernize-use-nullptr): there is none
   friend auto operator<=>(const NodeLink&, const NodeLink&) = default;
 };
 
