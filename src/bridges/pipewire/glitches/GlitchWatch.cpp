@@ -68,7 +68,8 @@ void GlitchWatch::settle(std::size_t index) {
     settleUnfinished(index);
   } else if (length_ > 0) {
     deviceXruns_ += xruns;  // the device often notices one cycle later
-    if (length_ > told_) tell(index - 1, true);
+    // A cycle of very many nodes may have taken the place of all that were kept.
+    if (length_ > told_ && index > 0) tell(index - 1, true);
     length_ = told_ = 0;
     deviceXruns_ = 0;
   } else if (xruns > 0) {
@@ -90,7 +91,8 @@ bool GlitchWatch::isGap(std::size_t index) const {
 void GlitchWatch::settleUnfinished(std::size_t index) {
   const KeptCycle& cycle = history_.cycle(index);
   if (length_ > 0 && !isSameGlitch(index)) {
-    if (length_ > told_) tell(index - 1, true);
+    // A cycle of very many nodes may have taken the place of all that were kept.
+    if (length_ > told_ && index > 0) tell(index - 1, true);
     length_ = told_ = 0;
   }
   if (length_ == 0) {
