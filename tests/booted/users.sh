@@ -28,7 +28,7 @@ check "the user's bus has the daemon's name" await says '^b true' as player busc
   /com/orvane/tonewerk/reporting com.orvane.tonewerk.TWReportingServiceProtocol CreateReportingSession x 5
 check 'a preference is written and kept at home' eval 'as player twctl defaults write com.orvane.tonewerk.store max_days 7 &&
   [ "$(stat --format %U /home/player/.local/state/tonewerk/preferences/com.orvane.tonewerk.store.toml)" = player ]'
-check 'an example reports to it, and prints the report that came of it' says 'Volume.Summary.*org.example.Report' as player /tests/report.c.out
+check 'an example reports to it, and prints the report that came of it' says 'org.example.Report.*Volume.Summary' as player /tests/report.c.out
 check 'from the store at home' user_stored "name = 'com.orvane.longformaudio.Volume.Summary' AND payload LIKE '%org.example.Report%'"
 
 # PipeWire is started by its socket. The guest has no sound card, so a virtual sink is created.
