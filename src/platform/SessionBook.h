@@ -4,6 +4,7 @@
 #include <cstdint>
 #include <memory>
 #include <optional>
+#include <string_view>
 #include <utility>
 
 #include "values/SharedString.h"
@@ -41,6 +42,9 @@ enum class SessionEnding {
   kDisconnected,  // its client has gone
   kInterrupted,   // the daemon has gone
 };
+
+// Returns "stopped", "replaced", "disconnected" or "interrupted".
+std::string_view textOf(SessionEnding ending);
 
 struct SessionEnd {
   double at = 0.0;  // seconds since 1970

@@ -50,20 +50,6 @@ std::string_view textOf(ReasonTrace::Outcome outcome) {
   return kOutcomeNotInGather;
 }
 
-std::string_view textOf(SessionEnding ending) {
-  switch (ending) {
-    case SessionEnding::kStopped:
-      return "stopped";
-    case SessionEnding::kReplaced:
-      return "replaced";
-    case SessionEnding::kDisconnected:
-      return "disconnected";
-    case SessionEnding::kInterrupted:
-      break;
-  }
-  return "interrupted";
-}
-
 void setIfKnown(ValueMap& line, std::string_view key, const std::optional<double>& number) {
   if (number) line.set(key, *number);
 }

@@ -6,20 +6,6 @@
 namespace tonewerk {
 namespace {
 
-std::string_view textOf(SessionEnding ending) {
-  switch (ending) {
-    case SessionEnding::kStopped:
-      return "stopped";
-    case SessionEnding::kReplaced:
-      return "replaced";
-    case SessionEnding::kDisconnected:
-      return "disconnected";
-    case SessionEnding::kInterrupted:
-      break;
-  }
-  return "interrupted";
-}
-
 void bindName(SqliteStatement& statement, int parameter, std::string_view name) {
   if (name.empty()) {
     statement.bindNull(parameter);
