@@ -6,6 +6,7 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <utility>
 
 #include "values/Value.h"
 
@@ -52,10 +53,15 @@ class FaultsignReporter {
 
   virtual ~FaultsignReporter() = default;
 
+  // A signature of these, unless a service makes its own.
   virtual FaultsignSignature signatureWithDomain(std::string domain, std::string type, std::string subType,
                                                  std::string subtypeContext,
                                                  std::optional<std::string> detectedProcess,
-                                                 std::optional<ValueMap> triggerThresholdValues) = 0;
+                                                 std::optional<ValueMap> triggerThresholdValues) {
+    return {std::move(domain),          std::move(type),
+            std::move(subType),         std::move(subtypeContext),
+            std::move(detectedProcess), std::move(triggerThresholdValues)};
+  }
 
   // Captures now. `duration` is in seconds. Returns true when the parameters were accepted; the reply then
   // says whether a capture was made. For refused parameters the reply may give the reason.

@@ -78,15 +78,6 @@ class LinuxCapsa::Reporter final : public FaultsignReporter {
  public:
   explicit Reporter(std::weak_ptr<Service> service) : service_(std::move(service)) {}
 
-  FaultsignSignature signatureWithDomain(std::string domain, std::string type, std::string subType,
-                                         std::string subtypeContext,
-                                         std::optional<std::string> detectedProcess,
-                                         std::optional<ValueMap> triggerThresholdValues) override {
-    return {std::move(domain),          std::move(type),
-            std::move(subType),         std::move(subtypeContext),
-            std::move(detectedProcess), std::move(triggerThresholdValues)};
-  }
-
   [[nodiscard]] bool snapshotWithSignature(const FaultsignSignature& signature, double duration,
                                            const std::optional<ValueMap>& /*event*/,
                                            const std::optional<ValueMap>& payload, Reply reply) override {
