@@ -6,7 +6,6 @@
 
 #include "platform/Log.h"
 #include "platform/accounts/Accounts.h"
-#include "platform/accounts/ChargeWithinShare.h"
 #include "platform/accounts/WorkingFor.h"
 #include "session/TWReportingContext.h"
 #include "session/TWReportingSession.h"
@@ -32,7 +31,7 @@ std::optional<bool> TWReportingSessionDriverSnapshotWorker::start() {
   TWReportingDriverUtility::Snapshot snapshot = utility.getSnapShot();
   const std::uint64_t bytes = TWReportingDriverUtility::ownBytesOf(snapshot);
   const std::shared_ptr<Account> account = accountOfThisThread();
-  std::optional<Charge> charge = chargeWithinShare(account, Resource::kSnapshotBytes, bytes);
+  std::optional<Charge> charge = Charge::withinShare(account, Resource::kSnapshotBytes, bytes);
   if (!charge) {
     const std::shared_ptr<TWReportingSession> owner = session.lock();
     errorLog(TWReportingDriverUtilityCategory(),

@@ -7,6 +7,7 @@
 #include <cstdint>
 #include <functional>
 #include <memory>
+#include <optional>
 #include <utility>
 #include <vector>
 
@@ -108,8 +109,11 @@ class Charge {
       : account_(std::move(account)), resource_(resource), amount_(amount) {
     if (account_ != nullptr) account_->charge(resource_, amount_);
   }
-  // Holds what has been taken.
-  static Charge ofTaken(std::shared_ptr<Account> account, Resource resource, std::uint64_t amount) {
+  // Charges `amount` if that is within the share of `account`, which is not null. Else it charges nothing,
+  // and the refusal is counted.
+  static std::optional<Charge> withinShare(std::shared_ptr<Account> account, Resource resource,
+                                           std::uint64_t amount) {
+    if (!account->take(resource, amount)) return std::nullopt;
     Charge charge;
     charge.account_ = std::move(account);
     charge.resource_ = resource;

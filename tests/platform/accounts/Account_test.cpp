@@ -7,7 +7,6 @@
 #include <vector>
 
 #include "platform/accounts/Accounts.h"
-#include "platform/accounts/ChargeWithinShare.h"
 #include "platform/accounts/WorkingFor.h"
 #include "protocol/RequestSet.h"
 #include "support/manual/ManualClock.h"
@@ -65,11 +64,11 @@ TEST_F(AccountTest, WhatIsGivenBackCanBeTakenAgain) {
 
 TEST_F(AccountTest, AChargeWithinTheShareTakesItsAmountOnceAndNothingAboveTheShare) {
   {
-    const std::optional<Charge> charge = chargeWithinShare(first, kKept, 300);
+    const std::optional<Charge> charge = Charge::withinShare(first, kKept, 300);
     ASSERT_TRUE(charge);
     EXPECT_EQ(charge->amount(), 300U);
     EXPECT_EQ(first->held(kKept), 300U);
-    EXPECT_FALSE(chargeWithinShare(first, kKept, 201));
+    EXPECT_FALSE(Charge::withinShare(first, kKept, 201));
     EXPECT_EQ(first->held(kKept), 300U);
     EXPECT_EQ(first->refused(kKept), 1U);
   }

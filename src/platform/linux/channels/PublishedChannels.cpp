@@ -9,7 +9,6 @@
 
 #include "platform/Log.h"
 #include "platform/accounts/Accounts.h"
-#include "platform/accounts/ChargeWithinShare.h"
 #include "platform/linux/channels/ChannelFailures.h"
 #include "platform/linux/files/TextFile.h"
 #include "platform/linux/files/WholeFile.h"
@@ -206,7 +205,7 @@ void PublishedChannels::charge(File& file) const {
   if (accounts_ == nullptr || !file.parsed) return;
   const std::uint64_t bytes = file.parsed->recordBytes();
   std::optional<Charge> charge =
-      chargeWithinShare(accounts_->of(file.owner), Resource::kSnapshotBytes, bytes);
+      Charge::withinShare(accounts_->of(file.owner), Resource::kSnapshotBytes, bytes);
   if (charge) return file.parsed->keep(std::move(*charge));
   const std::optional<FileStamp> stamp = file.stamp;
   file.clearContents();
@@ -219,7 +218,7 @@ void PublishedChannels::charge(File& file) const {
 
 bool PublishedChannels::hasRoomNow(const File& file) const {
   return file.refusedBytes != 0 &&
-         chargeWithinShare(accounts_->of(file.owner), Resource::kSnapshotBytes, file.refusedBytes);
+         Charge::withinShare(accounts_->of(file.owner), Resource::kSnapshotBytes, file.refusedBytes);
 }
 
 void PublishedChannels::logProblem(const std::string& path, const ChannelFileProblem& problem,
