@@ -8,7 +8,7 @@
 namespace tonewerk {
 
 CondensingLog::CondensingLog(std::unique_ptr<Log> log, const Clock& clock)
-    : log_(std::move(log)), clock_(clock) {}
+    : LogLayer(std::move(log)), clock_(clock) {}
 
 CondensingLog::~CondensingLog() {
   const MutexLock lock(mutex_);
@@ -19,7 +19,7 @@ void CondensingLog::write(std::string_view subsystem, std::string_view category,
                           std::string_view message) {
   const MutexLock lock(mutex_);
   if (isCounted(category, level, message)) return;
-  log_->write(subsystem, category, level, message);
+  below().write(subsystem, category, level, message);
   if (equalLines_ > 1) return;
   last_.subsystem = subsystem;
   last_.category = category;
@@ -43,8 +43,8 @@ bool CondensingLog::isCounted(std::string_view category, LogLevel level, std::st
 
 void CondensingLog::writeCount() {
   if (unsaid_ == 0) return;
-  log_->write(last_.subsystem, last_.category, last_.level,
-              "equal lines left out: " + std::to_string(std::exchange(unsaid_, 0)));
+  below().write(last_.subsystem, last_.category, last_.level,
+                "equal lines left out: " + std::to_string(std::exchange(unsaid_, 0)));
 }
 
 }  // namespace tonewerk

@@ -4,10 +4,9 @@
 #include <chrono>
 #include <cstdint>
 #include <memory>
-#include <optional>
 #include <string>
 
-#include "platform/Log.h"
+#include "platform/linux/log/LogLayer.h"
 #include "values/Mutex.h"
 
 namespace tonewerk {
@@ -18,7 +17,7 @@ class Clock;
 // there were is said in a line of its own, "equal lines left out: 4711": once a second while they come,
 // before the next other line, and at the end in order. So messages that arrive by the hundred thousand cannot
 // fill the log with one line, which would also be most of their cost.
-class CondensingLog final : public Log {
+class CondensingLog final : public LogLayer {
  public:
   static constexpr std::uint64_t kMaxEqualLines = 10;
   static constexpr std::chrono::seconds kCountPeriod{1};
@@ -29,12 +28,6 @@ class CondensingLog final : public Log {
   CondensingLog& operator=(const CondensingLog&) = delete;
   ~CondensingLog() override;
 
-  bool isEnabled(std::string_view category, LogLevel level) const override {
-    return log_->isEnabled(category, level);
-  }
-  std::optional<LogLevel> fixedThreshold(std::string_view category) const override {
-    return log_->fixedThreshold(category);
-  }
   void write(std::string_view subsystem, std::string_view category, LogLevel level,
              std::string_view message) override;
 
@@ -51,7 +44,6 @@ class CondensingLog final : public Log {
   bool isCounted(std::string_view category, LogLevel level, std::string_view message) REQUIRES(mutex_);
   void writeCount() REQUIRES(mutex_);
 
-  const std::unique_ptr<Log> log_;
   const Clock& clock_;
   Mutex mutex_;  // held while a line is written, so that a count follows its line
   Line last_ GUARDED_BY(mutex_);

@@ -9,16 +9,16 @@
 
 namespace tonewerk {
 
-EscapingLog::EscapingLog(std::unique_ptr<Log> log) : log_(std::move(log)) {}
+EscapingLog::EscapingLog(std::unique_ptr<Log> log) : LogLayer(std::move(log)) {}
 
 EscapingLog::~EscapingLog() = default;
 
 void EscapingLog::write(std::string_view subsystem, std::string_view category, LogLevel level,
                         std::string_view message) {
-  if (isPrintable(message)) return log_->write(subsystem, category, level, message);
+  if (isPrintable(message)) return below().write(subsystem, category, level, message);
   std::string text(message);
   text = LogLines::areKept() ? printableLines(std::move(text)) : printable(std::move(text));
-  log_->write(subsystem, category, level, text);
+  below().write(subsystem, category, level, text);
 }
 
 }  // namespace tonewerk

@@ -26,7 +26,7 @@ std::uint32_t currentUser() {
 
 }  // namespace
 
-FairLog::FairLog(std::unique_ptr<Log> log, const Clock& clock) : log_(std::move(log)), clock_(clock) {}
+FairLog::FairLog(std::unique_ptr<Log> log, const Clock& clock) : LogLayer(std::move(log)), clock_(clock) {}
 
 FairLog::~FairLog() {
   const MutexLock lock(mutex_);
@@ -40,7 +40,7 @@ void FairLog::write(std::string_view subsystem, std::string_view category, LogLe
   LineAllowance* const lines = LogLines::areKept() ? nullptr : WorkingFor::lines();
   if (lines != nullptr && !lines->takeLine()) return holdBack(currentUser());
   if (hasUnsaid_.load(std::memory_order_relaxed)) sayDueCounts();
-  log_->write(subsystem, category, level, message);
+  below().write(subsystem, category, level, message);
 }
 
 void FairLog::holdBack(std::uint32_t user) {
@@ -77,7 +77,7 @@ void FairLog::sayCount(std::uint32_t user, Held& held) {
 }
 
 void FairLog::say(const std::string& message) {
-  log_->write(kSubsystem, kCategory, LogLevel::kError, message);
+  below().write(kSubsystem, kCategory, LogLevel::kError, message);
 }
 
 }  // namespace tonewerk

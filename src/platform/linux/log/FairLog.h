@@ -6,10 +6,9 @@
 #include <cstdint>
 #include <map>
 #include <memory>
-#include <optional>
 #include <string>
 
-#include "platform/Log.h"
+#include "platform/linux/log/LogLayer.h"
 #include "values/Mutex.h"
 
 namespace tonewerk {
@@ -26,7 +25,7 @@ class Clock;
 //
 // So no client can fill the log or drive out the lines of others. Text that the daemon has collected itself
 // (platform/LogLines.h) counts as no line: whoever collects it limits it.
-class FairLog final : public Log {
+class FairLog final : public LogLayer {
  public:
   static constexpr std::chrono::seconds kCountPeriod{1};
 
@@ -36,12 +35,6 @@ class FairLog final : public Log {
   FairLog& operator=(const FairLog&) = delete;
   ~FairLog() override;
 
-  bool isEnabled(std::string_view category, LogLevel level) const override {
-    return log_->isEnabled(category, level);
-  }
-  std::optional<LogLevel> fixedThreshold(std::string_view category) const override {
-    return log_->fixedThreshold(category);
-  }
   void write(std::string_view subsystem, std::string_view category, LogLevel level,
              std::string_view message) override;
 
@@ -59,7 +52,6 @@ class FairLog final : public Log {
   void sayCount(std::uint32_t user, Held& held) REQUIRES(mutex_);
   void say(const std::string& message) REQUIRES(mutex_);
 
-  const std::unique_ptr<Log> log_;
   const Clock& clock_;
   std::atomic<bool> hasUnsaid_ = false;  // so that other lines take no lock
   Mutex mutex_;                          // held while counts are written, never while other lines are

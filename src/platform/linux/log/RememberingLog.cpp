@@ -13,7 +13,7 @@ namespace tonewerk {
 
 RememberingLog::RememberingLog(std::unique_ptr<Log> log, std::shared_ptr<RecentLines> lines,
                                const Clock& clock)
-    : log_(std::move(log)), lines_(std::move(lines)), clock_(clock) {}
+    : LogLayer(std::move(log)), lines_(std::move(lines)), clock_(clock) {}
 
 RememberingLog::~RememberingLog() = default;
 
@@ -21,7 +21,7 @@ void RememberingLog::write(std::string_view subsystem, std::string_view category
                            std::string_view message) {
   // Lines quote tools, files and directories, which need not be UTF-8.
   const std::string text = validUtf8(std::string(message));
-  log_->write(subsystem, category, level, text);
+  below().write(subsystem, category, level, text);
   lines_->add(StreamLog::format(clock_.now(), category, level, text));
 }
 

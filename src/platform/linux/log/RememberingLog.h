@@ -2,9 +2,8 @@
 #pragma once
 
 #include <memory>
-#include <optional>
 
-#include "platform/Log.h"
+#include "platform/linux/log/LogLayer.h"
 
 namespace tonewerk {
 
@@ -13,23 +12,16 @@ class RecentLines;
 
 // Passes lines on to another log and keeps the last ones in `lines`, in the format of StreamLog. Turns each
 // line into valid UTF-8 first, because the journal shows any other line as a blob.
-class RememberingLog final : public Log {
+class RememberingLog final : public LogLayer {
  public:
   // `clock` outlives the log.
   RememberingLog(std::unique_ptr<Log> log, std::shared_ptr<RecentLines> lines, const Clock& clock);
   ~RememberingLog() override;
 
-  bool isEnabled(std::string_view category, LogLevel level) const override {
-    return log_->isEnabled(category, level);
-  }
-  std::optional<LogLevel> fixedThreshold(std::string_view category) const override {
-    return log_->fixedThreshold(category);
-  }
   void write(std::string_view subsystem, std::string_view category, LogLevel level,
              std::string_view message) override;
 
  private:
-  const std::unique_ptr<Log> log_;
   const std::shared_ptr<RecentLines> lines_;
   const Clock& clock_;
 };

@@ -32,13 +32,13 @@ std::vector<LoggedTrouble> RecentTroubles::all() const {
 }
 
 TroubleLog::TroubleLog(std::unique_ptr<Log> log, std::shared_ptr<RecentTroubles> troubles, const Clock& clock)
-    : log_(std::move(log)), troubles_(std::move(troubles)), clock_(clock) {}
+    : LogLayer(std::move(log)), troubles_(std::move(troubles)), clock_(clock) {}
 
 TroubleLog::~TroubleLog() = default;
 
 void TroubleLog::write(std::string_view subsystem, std::string_view category, LogLevel level,
                        std::string_view message) {
-  log_->write(subsystem, category, level, message);
+  below().write(subsystem, category, level, message);
   if (level != LogLevel::kError) return;
   // The place of the line is aligned with spaces.
   message.remove_prefix(std::min(message.find_first_not_of(' '), message.size()));

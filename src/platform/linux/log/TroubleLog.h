@@ -4,12 +4,11 @@
 #include <cstddef>
 #include <list>
 #include <memory>
-#include <optional>
 #include <string_view>
 #include <vector>
 
 #include "platform/DaemonStatus.h"
-#include "platform/Log.h"
+#include "platform/linux/log/LogLayer.h"
 #include "values/Mutex.h"
 
 namespace tonewerk {
@@ -34,23 +33,16 @@ class RecentTroubles {
 
 // Passes lines on to another log, and keeps those at error level in `troubles`. A line belongs to the user
 // for whom its thread works (platform/accounts/WorkingFor.h).
-class TroubleLog final : public Log {
+class TroubleLog final : public LogLayer {
  public:
   // `clock` outlives the log.
   TroubleLog(std::unique_ptr<Log> log, std::shared_ptr<RecentTroubles> troubles, const Clock& clock);
   ~TroubleLog() override;
 
-  bool isEnabled(std::string_view category, LogLevel level) const override {
-    return log_->isEnabled(category, level);
-  }
-  std::optional<LogLevel> fixedThreshold(std::string_view category) const override {
-    return log_->fixedThreshold(category);
-  }
   void write(std::string_view subsystem, std::string_view category, LogLevel level,
              std::string_view message) override;
 
  private:
-  const std::unique_ptr<Log> log_;
   const std::shared_ptr<RecentTroubles> troubles_;
   const Clock& clock_;
 };
