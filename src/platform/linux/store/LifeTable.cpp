@@ -124,25 +124,13 @@ bool LifeTable::readRowsFrom(std::uint64_t request) {
 
 bool LifeTable::insert(const SessionBeginning& beginning, std::uint32_t user, std::int64_t identifier) {
   insert_.bind(1, beginning.at);
-  if (beginning.request == 0) {
-    insert_.bindNull(2);
-  } else {
-    insert_.bind(2, static_cast<std::int64_t>(beginning.request));
-  }
+  insert_.bindUnlessZero(2, static_cast<std::int64_t>(beginning.request));
   insert_.bind(3, beginning.reporterID);
   bindName(insert_, 4, beginning.service.view());
-  if (user == kNoUser) {
-    insert_.bindNull(5);
-  } else {
-    insert_.bind(5, static_cast<std::int64_t>(user));
-  }
+  insert_.bindUser(5, user);
   const bool isNew = identifier == 0;
   if (isNew && floor_ > 0) identifier = floor_ + 1;
-  if (identifier == 0) {
-    insert_.bindNull(6);
-  } else {
-    insert_.bind(6, identifier);
-  }
+  insert_.bindUnlessZero(6, identifier);
   if (!insert_.run()) return false;
   if (isNew) floor_ = 0;
   newRows_.push_back(user);

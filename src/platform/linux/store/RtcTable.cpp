@@ -76,16 +76,8 @@ bool RtcTable::insertSession(const std::shared_ptr<RtcSessionRecord>& session, s
   insertSession_.bind(1, session->startedAt);
   insertSession_.bind(2, sessionInfo);
   insertSession_.bind(3, userInfo);
-  if (user == kNoUser) {
-    insertSession_.bindNull(4);
-  } else {
-    insertSession_.bind(4, static_cast<std::int64_t>(user));
-  }
-  if (floor_ == 0) {
-    insertSession_.bindNull(5);
-  } else {
-    insertSession_.bind(5, floor_ + 1);
-  }
+  insertSession_.bindUser(4, user);
+  insertSession_.bindUnlessZero(5, floor_ == 0 ? 0 : floor_ + 1);
   if (!insertSession_.run()) return false;
   floor_ = 0;
   const auto identifier = database_.number("SELECT last_insert_rowid()");

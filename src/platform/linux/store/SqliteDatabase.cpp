@@ -5,6 +5,7 @@
 #include <utility>
 
 #include "platform/Heartbeat.h"
+#include "protocol/RequestSet.h"
 #include "values/Utf8.h"
 
 namespace tonewerk {
@@ -41,6 +42,22 @@ void SqliteStatement::bindBytes(int parameter, std::string_view bytes) {
 }
 
 void SqliteStatement::bindNull(int parameter) { sqlite3_bind_null(statement_, parameter); }
+
+void SqliteStatement::bindUnlessZero(int parameter, std::int64_t number) {
+  if (number == 0) {
+    bindNull(parameter);
+  } else {
+    bind(parameter, number);
+  }
+}
+
+void SqliteStatement::bindUser(int parameter, std::uint32_t user) {
+  if (user == kNoUser) {
+    bindNull(parameter);
+  } else {
+    bind(parameter, static_cast<std::int64_t>(user));
+  }
+}
 
 void SqliteStatement::bindColumn(int parameter, const SqliteStatement& row, int column) {
   sqlite3_bind_value(statement_, parameter, sqlite3_column_value(row.statement_, column));

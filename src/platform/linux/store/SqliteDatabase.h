@@ -37,6 +37,10 @@ class SqliteStatement {
   // Not copied either.
   void bindBytes(int parameter, std::string_view bytes);
   void bindNull(int parameter);
+  // 0 becomes a null.
+  void bindUnlessZero(int parameter, std::int64_t number);
+  // kNoUser becomes a null.
+  void bindUser(int parameter, std::uint32_t user);
   // A value of another statement's current row, of any type. It is copied.
   void bindColumn(int parameter, const SqliteStatement& row, int column);
 

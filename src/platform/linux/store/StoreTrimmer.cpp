@@ -56,14 +56,6 @@ std::string oldestChunk(const StoreTable& table) {
   return oldestRows(table, "id") + " LIMIT " + std::to_string(kChunkRows);
 }
 
-void bindUser(SqliteStatement& statement, int parameter, std::uint32_t user) {
-  if (user == kNoUser) {
-    statement.bindNull(parameter);
-  } else {
-    statement.bind(parameter, static_cast<std::int64_t>(user));
-  }
-}
-
 // What a round may still look at.
 struct RoundBudget {
   int rows = kLookedRowsPerRound;
@@ -485,7 +477,7 @@ bool StoreTrimmer::deleteRows(const StoreTable& table, std::uint32_t user, const
                         " WHERE id BETWEEN ?1 AND ?2 AND user_id IS ?3" + conditionOf(table));
   statement.bind(1, rows.first);
   statement.bind(2, rows.last);
-  bindUser(statement, 3, user);
+  statement.bindUser(3, user);
   return statement.run();
 }
 
