@@ -2,9 +2,11 @@
 //
 // Reads the input as a client's map, twice: as the argument of a request, and into a packed map. Both must
 // accept or refuse it in the same words, and must be the same map.
+#include <array>
 #include <cstddef>
 #include <cstdint>
 #include <cstdlib>
+#include <optional>
 #include <string>
 #include <string_view>
 
@@ -19,6 +21,41 @@ namespace {
 
 void expect(bool condition) {
   if (!condition) std::abort();
+}
+
+constexpr std::size_t kFrameAndArguments = 2;
+constexpr std::size_t kMaxLevels = kMaxFrameDepth - kFrameAndArguments;
+
+// Returns where the value at the start of the bytes ends, whatever it may mean. None when it has no end, a byte
+// that begins no value, or more levels than a frame has.
+std::optional<std::size_t> lengthOfValue(std::string_view bytes) {
+  std::array<std::size_t, kMaxLevels> missing{};  // values of each array and map
+  std::size_t depth = 0;
+  std::size_t at = 0;
+  do {
+    if (at == bytes.size()) return std::nullopt;
+    const std::uint8_t first = encoding::byteAt(bytes.data() + at);
+    if (first == encoding::kReserved) return std::nullopt;
+    std::size_t length = encoding::kFixedLengths[first];
+    std::size_t values = 0;
+    if (length == 0) {
+      if (encoding::headerLength(first) > bytes.size() - at) return std::nullopt;
+      const encoding::Extent extent = encoding::extentAt(bytes.data() + at);
+      const bool isMap = encoding::isMap(first);
+      const bool isContainer = isMap || encoding::isArray(first);
+      if (isContainer && depth == kMaxLevels) return std::nullopt;
+      if (isContainer) values = isMap ? 2 * extent.count : extent.count;
+      length = isContainer ? extent.header : extent.header + extent.count;
+    }
+    if (length > bytes.size() - at) return std::nullopt;
+    at += length;
+    if (values > 0) {
+      missing[depth++] = values;
+      continue;
+    }
+    while (depth > 0 && --missing[depth - 1] == 0) --depth;
+  } while (depth > 0);
+  return at;
 }
 
 void expectSame(const ValueMap& packed, const ValueMap& plain) {
@@ -41,8 +78,7 @@ void expectSame(const ValueMap& packed, const ValueMap& plain) {
 }
 
 void read(std::string_view bytes) {
-  constexpr std::size_t kFrameAndArguments = 2;
-  const encoding::Scanned scanned = encoding::scan(bytes, kMaxFrameDepth - kFrameAndArguments);
+  const std::optional<std::size_t> length = lengthOfValue(bytes);
   ShapeTable shapes;
   PackedMapReader packedReader;
   const PackedMapReader::Read read = packedReader.read(bytes, shapes);
@@ -68,10 +104,9 @@ void read(std::string_view bytes) {
   RpcFrameReader reader(texts);
   std::string_view rest = frame;
   const RpcFrameReader::Result result = reader.next(rest);
-  const bool isWhole = scanned.scan == encoding::Scan::kValue;
-  if (isWhole && frame.size() <= kMaxFrameBytes) expect(result == RpcFrameReader::Result::kFrame);
-  if (!isWhole) expect(result != RpcFrameReader::Result::kFrame);
-  if (!isWhole || scanned.length != bytes.size()) {
+  if (length && frame.size() <= kMaxFrameBytes) expect(result == RpcFrameReader::Result::kFrame);
+  if (!length) expect(result != RpcFrameReader::Result::kFrame);
+  if (length != bytes.size()) {
     expect(read.result != PackedMapReader::Result::kPacked);
     return;
   }

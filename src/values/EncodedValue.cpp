@@ -102,40 +102,6 @@ Extent extentAt(const char* at) {
   }
 }
 
-Scanned scan(std::string_view bytes, std::size_t levels) {
-  assert(levels <= kMaxLevels);
-  std::array<std::size_t, kMaxLevels> open{};  // values that are still missing, of each array and map
-  std::size_t depth = 0;
-  std::size_t at = 0;
-  for (;;) {
-    if (at == bytes.size()) return {Scan::kIncomplete, 0};
-    const std::uint8_t first = byteAt(bytes.data() + at);
-    if (first == kReserved) return {Scan::kInvalid, 0};
-    std::size_t length = kFixedLengths[first];
-    if (length == 0) {
-      const std::size_t left = bytes.size() - at;
-      if (headerLength(first) > left) return {Scan::kIncomplete, 0};
-      const Extent extent = extentAt(bytes.data() + at);
-      length = extent.header;
-      if (isArray(first) || isMap(first)) {
-        if (depth == levels) return {Scan::kTooDeep, 0};
-        const std::size_t values = isMap(first) ? 2 * extent.count : extent.count;
-        if (values > 0) {
-          at += length;
-          open[depth++] = values;
-          continue;
-        }
-      } else {
-        length += extent.count;
-      }
-    }
-    if (length > bytes.size() - at) return {Scan::kIncomplete, 0};
-    at += length;
-    while (depth > 0 && --open[depth - 1] == 0) --depth;
-    if (depth == 0) return {Scan::kValue, at};
-  }
-}
-
 }  // namespace encoding
 
 namespace {

@@ -153,22 +153,6 @@ decltype(auto) visitNumber(const char* at, Visitor&& visit) {
 // another length and for more than 999,999,999 nanoseconds.
 std::optional<Date> dateOf(std::string_view body);
 
-// What the start of some bytes is.
-enum class Scan {
-  kValue,       // one value, whatever it may mean
-  kIncomplete,  // the beginning of one
-  kInvalid,     // a byte that begins no value
-  kTooDeep      // more than `levels` arrays and maps nested inside each other
-};
-struct Scanned {
-  Scan scan = Scan::kValue;
-  std::size_t length = 0;  // the value's
-};
-inline constexpr std::size_t kMaxLevels = 32;
-// Finds the end of the value at the start of `bytes`, in one pass and without a look at texts. `levels` is at
-// most kMaxLevels.
-[[nodiscard]] Scanned scan(std::string_view bytes, std::size_t levels);
-
 }  // namespace encoding
 
 // Refers to one value that is encoded in MessagePack, or to none. Reading it allocates nothing; it has the

@@ -12,17 +12,10 @@
 namespace tonewerk {
 namespace {
 
-using encoding::Scan;
-using encoding::scan;
-
 std::string encoded(const Value& value) {
   std::string bytes;
   EXPECT_TRUE(appendEncoded(bytes, value));
   return bytes;
-}
-
-Scan scanned(std::string_view bytes, std::size_t levels = encoding::kMaxLevels) {
-  return scan(bytes, levels).scan;
 }
 
 TEST(EncodedValueTest, ReadsWhatWasEncodedInTheShortestForm) {
@@ -58,7 +51,6 @@ TEST(EncodedValueTest, ReadsWhatWasEncodedInTheShortestForm) {
     EXPECT_EQ(EncodedValue(bytes.data()).value(), value) << value.text().substr(0, 40);
     EXPECT_EQ(EncodedValue(bytes.data()).kind(), value.kind());
     EXPECT_EQ(EncodedValue(bytes.data()).bytes().size(), length);
-    EXPECT_EQ(scan(bytes + "x", 0).length, length);
   }
 }
 
@@ -70,7 +62,7 @@ TEST(EncodedValueTest, EncodesNothingThatHasNoExactForm) {
   }
 }
 
-TEST(EncodedValueTest, ScansWholeValuesOnly) {
+TEST(EncodedValueTest, KnowsWhereEachKindEnds) {
   using namespace std::literals;
   for (const std::string_view bytes :
        {"\xC0"sv, "\x01"sv, "\xA2xy"sv, "\xD9\x02xy"sv, "\xDA\0\x01x"sv, "\xDB\0\0\0\x01x"sv, "\xC4\x01x"sv,
@@ -82,30 +74,8 @@ TEST(EncodedValueTest, ScansWholeValuesOnly) {
         "a\x01\xA1"
         "b\x90"sv,
         "\xDC\0\x01\x80"sv, "\xDF\0\0\0\x01\x01\x01"sv, "\xCB\0\0\0\0\0\0\0\0"sv}) {
-    EXPECT_EQ(scanned(bytes), Scan::kValue);
-    EXPECT_EQ(scan(bytes, encoding::kMaxLevels).length, bytes.size());
-    for (std::size_t size = 0; size < bytes.size(); ++size)
-      EXPECT_EQ(scanned(bytes.substr(0, size)), Scan::kIncomplete) << size;
+    EXPECT_EQ(EncodedValue(bytes.data()).bytes(), bytes);
   }
-}
-
-TEST(EncodedValueTest, ScansNoReservedByte) {
-  EXPECT_EQ(scanned("\xC1"), Scan::kInvalid);
-  EXPECT_EQ(scanned("\x92\x01\xC1"), Scan::kInvalid);
-}
-
-TEST(EncodedValueTest, ScansNoDeeperThanAsked) {
-  EXPECT_EQ(scanned("\x91\x91\x01", 2), Scan::kValue);
-  EXPECT_EQ(scanned("\x91\x91\x01", 1), Scan::kTooDeep);
-  EXPECT_EQ(scanned("\x91\x90", 1), Scan::kTooDeep);
-  EXPECT_EQ(scanned("\x01", 0), Scan::kValue);
-  EXPECT_EQ(scanned("\x90", 0), Scan::kTooDeep);
-}
-
-TEST(EncodedValueTest, AHugeCountCostsNothing) {
-  EXPECT_EQ(scanned("\xDD\xFF\xFF\xFF\xFF\x01"), Scan::kIncomplete);
-  EXPECT_EQ(scanned("\xDF\xFF\xFF\xFF\xFF\x01"), Scan::kIncomplete);
-  EXPECT_EQ(scanned("\xC9\xFF\xFF\xFF\xFF\x01"), Scan::kIncomplete);
 }
 
 TEST(EncodedValueTest, ReadsTheThreeFormsOfADate) {
