@@ -13,8 +13,10 @@ namespace {
 
 bool isTraceable(const std::string& name) {
   return !name.empty() && name.size() <= WantedSignposts::kMaxNameBytes &&
-         std::none_of(name.begin(), name.end(),
-                      [](char c) { return static_cast<unsigned char>(c) < ' ' || c == '"'; });
+         std::none_of(name.begin(), name.end(), [](char c) {
+           constexpr char kDelete = '\x7F';
+           return static_cast<unsigned char>(c) < ' ' || c == kDelete || c == '"';
+         });
 }
 
 std::string problemOf(const std::set<std::string>& names) {

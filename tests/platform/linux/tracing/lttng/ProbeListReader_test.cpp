@@ -62,8 +62,9 @@ TEST_F(ProbeListReaderTest, AcceptsNamesThatSignpostsCanHave) {
 }
 
 TEST_F(ProbeListReaderTest, RefusesNamesThatNoSignpostCanHave) {
-  for (const std::string& name : {std::string(), std::string(WantedSignposts::kMaxNameBytes + 1, 'x'),
-                                  std::string("a\\nb"), std::string("a\\u0000b"), std::string("a\\\"b")}) {
+  for (const std::string& name :
+       {std::string(), std::string(WantedSignposts::kMaxNameBytes + 1, 'x'), std::string("a\\nb"),
+        std::string("a\\u0000b"), std::string("a\\u007Fb"), std::string("a\\\"b")}) {
     EXPECT_EQ(read(interval(name)).problem,
               "the probe list /probes.json holds a name that no signpost can have")
         << name;
