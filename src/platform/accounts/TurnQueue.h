@@ -145,6 +145,7 @@ class TurnQueue : public std::enable_shared_from_this<TurnQueue> {
   std::atomic<bool> mustGiveUp_ = false;
 
   mutable Mutex mutex_;  // held while a turn is queued, never while one runs
+  // One for each account that has had work. They stay, as the accounts do (Accounts::kMaxAccounts).
   std::map<const Account*, Lane> lanes_ GUARDED_BY(mutex_);
   std::deque<Lane*> ready_ GUARDED_BY(mutex_);
   std::size_t waitingLanes_ GUARDED_BY(mutex_) = 0;
