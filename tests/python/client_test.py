@@ -92,6 +92,33 @@ class ClientTest(DaemonTestCase):
         self.end_daemon()
         self.assertEqual([row["seconds"] for row in self.rows("SELECT seconds FROM volume_stretch")], [2])
 
+    def test_ends_without_an_error_after_its_client(self):
+        with self.client() as client, self.player(client) as session, session.playing(1) as playing, session.recording():
+            client.close(0)
+            self.assertFalse(playing.stop())
+            with self.assertRaises(reporting.ClosedError):
+                session.stop()
+
+    def test_counts_what_plays_through_a_restart_for_the_later_life(self):
+        clock = Clock(self)
+        self.start_daemon()
+        client = self.client()
+        session = self.player(client)
+        session.start()
+        playing = session.playing(1)
+        self.assertEqual(client.get_all_reporters().result(PATIENCE), [session.id])  # so the daemon knows what is before it
+        clock.pass_by(4)
+        self.kill_daemon()
+        self.start_daemon()
+        self.wait_until(lambda: client.info().connections == 2)
+        clock.pass_by(2)
+        playing.stop()
+        session.close()
+        client.close(PATIENCE)
+        self.end_daemon()
+        lives = self.rows("SELECT active_seconds FROM session ORDER BY id")
+        self.assertEqual([life["active_seconds"] for life in lives], [0, 6])
+
     def test_asks_what_can_be_asked(self):
         self.start_daemon()
         client = self.client()

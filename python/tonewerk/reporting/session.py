@@ -2,6 +2,7 @@
 """Sessions, and what their audio does."""
 
 import concurrent.futures
+import contextlib
 import dataclasses
 import math
 import threading
@@ -212,8 +213,9 @@ class Session:
             return True
 
     def _end_activity(self) -> None:
-        self.end_use(Playing.KEY, Playing.CATEGORY)
-        self.end_use(RecordingInput.KEY, RecordingInput.CATEGORY)
+        with contextlib.suppress(ClosedError):  # the end of the client has ended it
+            self.end_use(Playing.KEY, Playing.CATEGORY)
+            self.end_use(RecordingInput.KEY, RecordingInput.CATEGORY)
 
 
 class _AudioUse:
@@ -227,9 +229,13 @@ class _AudioUse:
         self._has_begun = session.begin_use(self.KEY, self.CATEGORY)
 
     def stop(self) -> bool:
-        """Ends it. Returns whether there was room to say so; if not, the session's end tries again."""
-        if self._has_begun and not self._session._is_closed:
-            self._has_begun = not self._session.end_use(self.KEY, self.CATEGORY)
+        """Ends it. Returns whether there was room to say so; if not, the session's end tries again.
+
+        Does nothing when its session or client is closed already.
+        """
+        if self._has_begun:
+            with contextlib.suppress(ClosedError):
+                self._has_begun = not self._session.end_use(self.KEY, self.CATEGORY)
         return not self._has_begun
 
     def __bool__(self) -> bool:
