@@ -1,38 +1,28 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "client/AudioActivity.h"
 
-#include <ctime>
+#include <algorithm>
 
 namespace tonewerk {
-namespace {
 
-// Reading this clock makes no system call, whatever the clock source is.
-std::uint64_t coarseMicroseconds() {
-  timespec now{};
-  ::clock_gettime(CLOCK_MONOTONIC_COARSE, &now);
-  return static_cast<std::uint64_t>(now.tv_sec) * 1'000'000U +
-         static_cast<std::uint64_t>(now.tv_nsec) / 1000U;
-}
-
-}  // namespace
-
-bool AudioActivity::begin(Kind kind) {
-  const std::uint64_t now = coarseMicroseconds() * (kKinds + 1);
+bool AudioActivity::begin(Kind kind, Time now) {
+  const std::uint64_t since = static_cast<std::uint64_t>(now.count()) * (kKinds + 1);
   std::uint64_t seen = state_.load();
-  while (!state_.compare_exchange_weak(seen, ((seen & kKinds) == 0 ? now : seen) | kind)) {
+  while (!state_.compare_exchange_weak(seen, ((seen & kKinds) == 0 ? since : seen) | kind)) {
   }
   return (seen & kind) == 0;
 }
 
-AudioActivity::End AudioActivity::end(Kind kind) {
+AudioActivity::End AudioActivity::end(Kind kind, Time now) {
   std::uint64_t seen = state_.load();
   while (!state_.compare_exchange_weak(seen, seen & ~std::uint64_t{kind})) {
   }
   if ((seen & kind) == 0) return {};
   End end{true, std::nullopt, seen & ~kKinds};
   if ((seen & kKinds) == kind) {
-    const std::uint64_t began = seen / (kKinds + 1);
-    end.seconds = static_cast<double>(coarseMicroseconds() - began) / 1e6;
+    // Another thread may have ended and begun the same after this one has looked at its clock.
+    const Time length = std::max(Time::zero(), now - Time(seen / (kKinds + 1)));
+    end.seconds = std::chrono::duration<double>(length).count();
   }
   return end;
 }

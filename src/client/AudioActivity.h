@@ -2,6 +2,7 @@
 #pragma once
 
 #include <atomic>
+#include <chrono>
 #include <cstdint>
 #include <optional>
 
@@ -10,9 +11,12 @@ namespace tonewerk {
 // Knows whether a session plays and records, and since when it has done the first of the two without a pause.
 //
 // Any thread may call it. It takes no lock, allocates nothing and makes no system call. A call repeats its
-// few instructions only when another thread has begun or ended something in between.
+// few instructions only when another thread has begun or ended something in between. `now` is the time of a
+// monotonic clock, the same one for all calls.
 class AudioActivity {
  public:
+  using Time = std::chrono::microseconds;
+
   enum Kind : std::uint64_t { kPlaying = 1, kRecording = 2 };
 
   struct End {
@@ -24,8 +28,8 @@ class AudioActivity {
   };
 
   // Returns false when it was running already.
-  bool begin(Kind kind);
-  End end(Kind kind);
+  bool begin(Kind kind, Time now);
+  End end(Kind kind, Time now);
   // Takes back an end that could not be reported.
   void resume(Kind kind, const End& end);
 

@@ -11,6 +11,7 @@
 #include <charconv>
 #include <cmath>
 #include <cstring>
+#include <ctime>
 #include <optional>
 #include <string_view>
 
@@ -22,6 +23,14 @@ namespace tonewerk {
 namespace {
 
 using Kind = AudioActivity::Kind;
+
+// Reading this clock makes no system call, whatever the clock source is.
+AudioActivity::Time coarseNow() {
+  timespec now{};
+  ::clock_gettime(CLOCK_MONOTONIC_COARSE, &now);
+  return std::chrono::seconds(now.tv_sec) +
+         std::chrono::duration_cast<AudioActivity::Time>(std::chrono::nanoseconds(now.tv_nsec));
+}
 
 // Has room for the texts of every function here.
 class AudioPayload {
@@ -71,11 +80,11 @@ template <class Target>
 twr_status begin(Target& target, Kind kind) {
   AudioActivity& activity = activityOf(target);
   // A start is sent even if it runs already: a daemon that has restarted does not know.
-  const bool begins = activity.begin(kind);
+  const bool begins = activity.begin(kind, coarseNow());
   AudioPayload payload;
   twr_put_bool(payload.get(), keyOf(kind), 1);
   const twr_status status = send(&target, categoryOf(kind), TWR_TYPE_STATE, payload);
-  if (status != TWR_OK && begins) activity.end(kind);
+  if (status != TWR_OK && begins) activity.end(kind, coarseNow());
   return status;
 }
 
@@ -83,7 +92,7 @@ template <class Target>
 twr_status end(Target* target, Kind kind) {
   if (target == nullptr) return TWR_INVALID;
   AudioActivity& activity = activityOf(*target);
-  const AudioActivity::End end = activity.end(kind);
+  const AudioActivity::End end = activity.end(kind, coarseNow());
   if (!end.wasRunning) return TWR_OK;
   AudioPayload payload;
   twr_put_bool(payload.get(), keyOf(kind), 0);
