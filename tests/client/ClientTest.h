@@ -80,9 +80,10 @@ class AnswerLog {
 
 // Runs a client with short delays against a scripted daemon, through the C interface.
 class ClientTest : public testing::Test {
- protected:
+ public:
   ~ClientTest() override { twr_client_destroy(client, 0); }
 
+ protected:
   static ClientSettings settings(const std::string& path) {
     ClientSettings chosen;
     chosen.socketPaths = {path};

@@ -40,8 +40,11 @@ RC_GTEST_PROP(TWReportingNameTableProperty, GivesEveryCategoryTypeAndServiceItsO
     ending += c;
     ending += '.';
     ending += t;
+    std::string ofService = "com.orvane.";
+    ofService += s;
+    ofService += ending;
     RC_ASSERT(names.first.string() == "com.orvane.tonewerk" + ending);
-    RC_ASSERT(names.second.string() == "com.orvane." + s + ending);
+    RC_ASSERT(names.second.string() == ofService);
   }
 }
 

@@ -66,6 +66,7 @@ void takeOut(json& value, std::vector<double>& times) {
 std::vector<std::string> missingIn(const std::vector<Row>& rows, const std::vector<Row>& wanted) {
   const auto textsOf = [](const std::vector<Row>& all) {
     std::vector<std::string> texts;
+    texts.reserve(all.size());
     for (const Row& row : all) texts.push_back(row.what);
     return texts;
   };

@@ -34,7 +34,7 @@ bool becomesTrue(const std::function<bool()>& condition) {
   const auto end = std::chrono::steady_clock::now() + 30s;
   while (!condition()) {
     if (std::chrono::steady_clock::now() > end) return false;
-    std::this_thread::sleep_for(1ms);
+    std::this_thread::yield();
   }
   return true;
 }
