@@ -26,8 +26,8 @@ void expect(bool condition) {
 constexpr std::size_t kFrameAndArguments = 2;
 constexpr std::size_t kMaxLevels = kMaxFrameDepth - kFrameAndArguments;
 
-// Returns where the value at the start of the bytes ends, whatever it may mean. None when it has no end, a byte
-// that begins no value, or more levels than a frame has.
+// Returns where the value at the start of the bytes ends, whatever it may mean. None when it has no end, a
+// byte that begins no value, or more levels than a frame has.
 std::optional<std::size_t> lengthOfValue(std::string_view bytes) {
   std::array<std::size_t, kMaxLevels> missing{};  // values of each array and map
   std::size_t depth = 0;
