@@ -17,6 +17,7 @@
 #include <string>
 #include <string_view>
 #include <sys/resource.h>
+#include <system_error>
 #include <unistd.h>
 
 #include "monitor/TWReportingSystemMonitor.h"
@@ -180,7 +181,12 @@ class Daemon {
         listener_(std::move(socket), log, linux.accounts(), watchdogOf(manager, linux.clock(), heartbeats_),
                   &linux.memory(), [this] { writeJournal(); }),
         dbusListener_(dbusNames(), requests::all(), dbusAddressFromEnvironment(), log, linux.accounts(),
-                      &linux.memory()) {
+                      &linux.memory()) {}
+
+  // Recovers what the last daemon left, and serves clients. False when the system gives no descriptors for
+  // that, which it logs. Then nothing was recovered, and there is nothing to end in order.
+  [[nodiscard]] bool start() {
+    if (!canServe(listener_.problem()) || !canServe(dbusListener_.problem())) return false;
     diagnostics_.removeLeftovers();  // this daemon has the socket, so no other one writes there
     TWReportingSessionSummaryJsonFileWorker::tidyDirectory();
     // Read once here, so that reading the device facts again later does not change it.
@@ -203,6 +209,7 @@ class Daemon {
         runtimeDirectory_, [](std::string_view) {}, [this] { restoreRuntimeDirectory(); }, log_);
     restoreRuntimeDirectory();  // it may have been removed before it was watched
     manager_.tellReady(status_);
+    return true;
   }
 
   // Reads the preferences and device facts again, and restores the runtime directory with the socket.
@@ -258,6 +265,11 @@ class Daemon {
   }
 
  private:
+  bool canServe(const std::error_code& problem) const {
+    if (problem) errorLog(log_, "cannot serve: %@", problem.message());
+    return !problem;
+  }
+
   void recover() {
     SessionRecovery recovery({journal_, attempts_, store_, linux_.accounts(), context_, *service_, log_});
     if (!recovery.begin(store_.marks())) return;
@@ -449,6 +461,7 @@ int run() {
   defaultLog(log, "listening on %@, state in %@", socket->name(), directories.state);
   const ServiceManager manager{};
   Daemon daemon(directories, std::move(socket), linux, manager, log);
+  if (!daemon.start()) return kFailure;
   serveUntilEndSignal(daemon);
   const bool areReportsWritten = daemon.endInOrder();
   if (daemon.hangs()) {

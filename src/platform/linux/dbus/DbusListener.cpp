@@ -25,7 +25,7 @@ DbusListener::~DbusListener() { shutDown(); }
 
 void DbusListener::resume() {
   const MutexLock lock(lifeMutex_);
-  assert(delegate_ != nullptr);
+  assert(delegate_ != nullptr && !problem());
   if (thread_.joinable() || isStopping_) return;
   thread_ = std::thread([this] { run(); });
 }

@@ -6,6 +6,7 @@
 #include <memory>
 #include <optional>
 #include <string>
+#include <system_error>
 #include <thread>
 
 #include "platform/Heartbeat.h"
@@ -36,6 +37,9 @@ class DbusListener final : public MessagingListener {
   DbusListener(DbusNames names, const RequestSet& methods, std::string address, const LogCategory& log,
                Accounts& accounts, AllocatorReclaimer* memory = nullptr);
   ~DbusListener() override;
+
+  // Why the bus's thread could not be woken: the system had no descriptor. Then resume() is not called.
+  std::error_code problem() const { return waker_->problem(); }
 
   void setDelegate(MessagingListenerDelegate& delegate) override { delegate_ = &delegate; }
   void resume() override;

@@ -2,11 +2,13 @@
 #pragma once
 
 #include <array>
+#include <cerrno>
 #include <chrono>
 #include <cstdint>
 #include <optional>
 #include <span>
 #include <sys/epoll.h>
+#include <system_error>
 
 #include "platform/linux/descriptors/FileDescriptor.h"
 
@@ -20,7 +22,10 @@ class Epoll {
     std::uint32_t events;  // EPOLLIN and so on
   };
 
-  Epoll() : descriptor_(::epoll_create1(EPOLL_CLOEXEC)) {}
+  Epoll() : descriptor_(::epoll_create1(EPOLL_CLOEXEC)), error_(descriptor_ ? 0 : errno) {}
+
+  // Why the system has given none. Then add() and change() fail, and wait() does not wait.
+  std::error_code problem() const { return {error_, std::generic_category()}; }
 
   [[nodiscard]] bool add(int descriptor, std::uint64_t identifier, std::uint32_t events) {
     return control(EPOLL_CTL_ADD, descriptor, identifier, events);
@@ -55,6 +60,7 @@ class Epoll {
   }
 
   FileDescriptor descriptor_;
+  int error_;
   std::array<Event, kMaxAtOnce> events_{};
 };
 

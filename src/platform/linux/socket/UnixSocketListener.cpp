@@ -46,13 +46,17 @@ UnixSocketListener::UnixSocketListener(std::unique_ptr<ServerSocket> socket, con
       watchdog_(std::move(watchdog)),
       maxConnections_(descriptorsForClients()) {
   accounts_.totals().setTotal(Resource::kConnections, maxConnections_);
+  problem_ = epoll_.problem() ? epoll_.problem() : waker_->problem();
+  if (!problem_ && !epoll_.add(waker_->fileDescriptor(), kWaker, EPOLLIN | EPOLLET)) {
+    problem_ = {errno, std::generic_category()};
+  }
 }
 
 UnixSocketListener::~UnixSocketListener() { shutDown(); }
 
 void UnixSocketListener::resume() {
   const MutexLock lock(lifeMutex_);
-  assert(delegate_ != nullptr);
+  assert(delegate_ != nullptr && !problem_);
   if (thread_.joinable() || isStopping_) return;
   thread_ = std::thread([this] { run(); });
 }
@@ -68,10 +72,6 @@ void UnixSocketListener::shutDown() {
 
 void UnixSocketListener::run() {
   ::pthread_setname_np(::pthread_self(), "tw-messaging");
-  // Without the waker the thread would never notice that it has to stop.
-  if (!epoll_.add(waker_->fileDescriptor(), kWaker, EPOLLIN | EPOLLET)) {
-    errorLog(log_, "cannot be woken: %@", std::generic_category().message(errno));
-  }
   watchSocket();
   infoLog(log_, "listening at %@", socket_->name());
   while (!isStopping_) {

@@ -9,6 +9,7 @@
 #include <functional>
 #include <memory>
 #include <optional>
+#include <system_error>
 #include <thread>
 #include <unordered_map>
 #include <vector>
@@ -49,6 +50,9 @@ class UnixSocketListener final : public MessagingListener {
                      std::unique_ptr<WatchdogFeeder> watchdog = nullptr, AllocatorReclaimer* memory = nullptr,
                      std::function<void()> beforeReplies = {});
   ~UnixSocketListener() override;
+
+  // Why the messaging thread could not be woken: the system had no descriptors. Then resume() is not called.
+  std::error_code problem() const { return problem_; }
 
   void setDelegate(MessagingListenerDelegate& delegate) override { delegate_ = &delegate; }
   void resume() override;
@@ -102,6 +106,7 @@ class UnixSocketListener final : public MessagingListener {
   // Used by the messaging thread only.
   Epoll epoll_;
   const std::shared_ptr<IoWaker> waker_ = std::make_shared<IoWaker>();
+  std::error_code problem_;
   Accounts& accounts_;
   std::vector<std::uint64_t> waiting_;  // connections whose users had no room
   std::optional<std::chrono::steady_clock::time_point> wakeWaitingAt_;

@@ -146,12 +146,14 @@ void watch(int stop, const std::string& address, PowerProfileWatcher::ChangeHand
 }  // namespace
 
 PowerProfileWatcher::PowerProfileWatcher(ChangeHandler handler, std::string busAddress)
-    : stop_(eventfd(0, EFD_CLOEXEC)),
-      thread_([stop = stop_.get(), changed = std::move(handler), address = std::move(busAddress)]() mutable {
-        watch(stop, address, changed);
-      }) {}
+    : stop_(eventfd(0, EFD_CLOEXEC)) {
+  if (!stop_) return;  // the thread could not be ended
+  thread_ = std::thread([stop = stop_.get(), changed = std::move(handler),
+                         address = std::move(busAddress)]() mutable { watch(stop, address, changed); });
+}
 
 PowerProfileWatcher::~PowerProfileWatcher() {
+  if (!thread_.joinable()) return;
   eventfd_write(stop_.get(), 1);
   thread_.join();
 }

@@ -15,7 +15,7 @@ namespace tonewerk {
 //
 // It runs on a thread of its own, so that no caller waits for the bus. It asks for the profile and then
 // listens for signals. It does not start the service, but notices when it starts. Without a bus, it tries
-// again every minute.
+// again every minute. When the system has no descriptor for its end, it does not run.
 class PowerProfileWatcher {
  public:
   // Called on the watcher's thread when the profile becomes "power-saver" or stops being it. The initial

@@ -1,12 +1,13 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/threads/IoWaker.h"
 
+#include <cerrno>
 #include <sys/eventfd.h>
 #include <utility>
 
 namespace tonewerk {
 
-IoWaker::IoWaker() : event_(::eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK)) {}
+IoWaker::IoWaker() : event_(::eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK)), error_(event_ ? 0 : errno) {}
 
 void IoWaker::wake(std::uint64_t connection) {
   {

@@ -2,6 +2,7 @@
 #pragma once
 
 #include <cstdint>
+#include <system_error>
 #include <vector>
 
 #include "platform/linux/descriptors/FileDescriptor.h"
@@ -15,6 +16,9 @@ class IoWaker {
  public:
   IoWaker();
 
+  // Why the system has given no descriptor. Then nobody is woken.
+  std::error_code problem() const { return {error_, std::generic_category()}; }
+
   // Any thread.
   void wake(std::uint64_t connection);
 
@@ -26,6 +30,7 @@ class IoWaker {
 
  private:
   FileDescriptor event_;
+  int error_;
   Mutex mutex_;
   std::vector<std::uint64_t> waiting_ GUARDED_BY(mutex_);
 };

@@ -614,6 +614,29 @@ TEST_F(FewDescriptorsTest, LeavesHalfOfTheDescriptorsToTheDaemonAndLetsClientsWa
               ElementsAre(HasSubstr("cannot accept another client for now: too many clients")));
 }
 
+// Such a listener once served nobody, spun, and could not be ended.
+TEST(UnixSocketListenerWithoutDescriptorsTest, SaysThatItCannotServe) {
+  const TemporaryDirectory directory;
+  MemoryLog log;
+  const LogCategory category(log, "com.example", "twrs");
+  TestAccounts accounts;
+  for (const long number : {SYS_epoll_create1, SYS_eventfd2, SYS_epoll_ctl}) {
+    SCOPED_TRACE(number);
+    std::error_code problem;
+    const auto make = [&] {
+      std::string why;
+      const UnixSocketListener listener(ServerSocket::open(directory.path("reporting.sock"), why), category,
+                                        accounts);
+      problem = listener.problem();
+    };
+    if (!runIntercepted(
+            number, [](const seccomp_data&) { return EMFILE; }, make)) {
+      GTEST_SKIP() << "system calls cannot be intercepted here";
+    }
+    EXPECT_EQ(problem, std::errc::too_many_files_open);
+  }
+}
+
 // The kernel's answer is intercepted. With a real shortage the sanitizers, which need descriptors to read
 // memory safely, would report correct code.
 TEST(UnixSocketListenerShortageTest, PausesWhenTheSystemHasNoDescriptorAndLogsThatOnce) {
