@@ -5,6 +5,7 @@
 #include <fstream>
 #include <map>
 #include <utility>
+#include <vector>
 
 #include "bridges/pipewire/graph/CleanText.h"
 
@@ -40,7 +41,11 @@ std::optional<ProcessFacts> KernelFacts::process(std::int32_t process, std::chro
   std::map<std::int32_t, Sums> threads;
   ProcessFacts facts;
   bool hasNumbers = false;
-  for (const ThreadMoment& moment : sampler_.threadMoments(process, from, to)) {
+  const std::vector<ThreadMoment> moments = sampler_.threadMoments(process, from, to);
+  facts.isThreadKnown =
+      std::any_of(moments.begin(), moments.end(), [](const ThreadMoment& moment) { return moment.isAudio; });
+  for (const ThreadMoment& moment : moments) {
+    if (moment.isAudio != facts.isThreadKnown) continue;
     Sums& sums = threads[moment.tid];
     sums.ran += moment.ran;
     sums.waited += moment.waited;

@@ -25,7 +25,7 @@ struct UsualTimes {
   std::int32_t compute = 0;  // from then until it has finished
 };
 
-// What the kernel said about the threads of one process around a glitch.
+// What the kernel said about the audio threads of one process around a glitch.
 struct ProcessFacts {
   std::chrono::nanoseconds ran{0};     // the thread that ran longest
   std::chrono::nanoseconds waited{0};  // for a processor; the thread that waited longest
@@ -34,6 +34,7 @@ struct ProcessFacts {
   bool isRunnable = false;             // a thread was to run, but hardly ran; its wait may not be counted yet
   bool isWaitingForDevice = false;     // a thread was in an uninterruptible sleep
   bool isRealTime = true;              // all its audio threads have a real-time policy
+  bool isThreadKnown = true;  // false: all this is of any threads of the process; one is its audio thread
 };
 
 // Somebody who kept a processor busy at a real-time policy.

@@ -62,6 +62,7 @@ class Judge {
         *std::max_element(delays_.begin(), delays_.end(),
                           [&](const Delay& a, const Delay& b) { return weightOf(a) < weightOf(b); });
     Verdict verdict = judge(worst);
+    lowerForUnknownThread(worst, verdict);
     lowerForOthers(worst, verdict);
     return verdict;
   }
@@ -356,6 +357,15 @@ class Judge {
     verdict.reason += ".";
     if (delay.isOpen) verdict.confidence = 0.8;
     return verdict;
+  }
+
+  // What any thread of the process did may be another's doing; that a process was stopped is of all of them.
+  void lowerForUnknownThread(const Delay& worst, Verdict& verdict) const {
+    const ProcessFacts* facts = factsOf(worst.node);
+    const bool isOfNode = verdict.culprit != 0;
+    if (!isOfNode || facts == nullptr || facts->isThreadKnown || facts->isStopped) return;
+    verdict.confidence *= 0.8;
+    verdict.reason += " (Its audio thread is not known: these are figures of all its threads.)";
   }
 
   // Somebody else was nearly as slow in this cycle.

@@ -55,10 +55,20 @@ void AudioThreads::lookAt(Process& process) {
     if (tid <= 0 || listed_.size() >= kMaxSeen) return;
     const auto known = std::find_if(process.seen.begin(), process.seen.end(),
                                     [&](const Seen& seen) { return seen.tid == tid; });
-    listed_.push_back(known == process.seen.end() ? Seen{tid, 0} : *known);
+    listed_.push_back(known == process.seen.end() ? Seen{tid, 0, false} : *known);
   });
+  // One that has lost its real-time policy is followed on.
+  bool isKnown = std::any_of(process.threads.begin(), process.threads.end(),
+                             [](const Thread& thread) { return thread.isAudio && thread.stat; });
   for (Seen& seen : listed_) {
-    if (isAudio(process.pid, seen)) follow(process, seen.tid);
+    if (!isAudio(process.pid, seen)) continue;
+    isKnown = true;
+    follow(process, seen.tid, true);
+  }
+  if (isKnown) {
+    std::erase_if(process.threads, [](const Thread& thread) { return !thread.isAudio; });
+  } else {
+    followOthers(process);
   }
   // Threads that have ended are no longer listed; their numbers may come again.
   process.seen.assign(listed_.begin(), listed_.end());
@@ -67,33 +77,61 @@ void AudioThreads::lookAt(Process& process) {
 bool AudioThreads::isAudio(std::int32_t pid, Seen& seen) {
   const int policy = calls_.policyOf(seen.tid);
   if (policy == SCHED_FIFO || policy == SCHED_RR) return true;
-  if (seen.looks >= kLooks) return false;
+  if (seen.isNamed || seen.looks >= kLooks) return seen.isNamed;
   ++seen.looks;
   const KernelFile file(directoryOf(proc_, pid, seen.tid) / "stat");
   const auto stat = threadStatIn(file.read(buffer_).value_or(std::string_view()));
-  return stat && stat->name.view().starts_with(kLibraryName);
+  seen.isNamed = stat && stat->name.view().starts_with(kLibraryName);
+  return seen.isNamed;
 }
 
-void AudioThreads::follow(Process& process, std::int32_t tid) {
-  for (Thread& thread : process.threads) {
-    if (thread.tid == tid && thread.stat) return;
+void AudioThreads::followOthers(Process& process) {
+  std::size_t elsewhere = 0;
+  for (const Process& each : processes_) {
+    if (&each != &process) elsewhere += count(each, false);
   }
-  std::size_t count = 0;
-  for (const Process& each : processes_) count += each.threads.size();
-  const bool isFull = process.threads.size() >= KernelSampler::kMaxThreadsOfProcess;
-  if (isFull || count >= KernelSampler::kMaxThreads) {
-    // Only a thread that has ended gives its place, and the samples of it.
-    const auto ended = std::find_if(process.threads.begin(), process.threads.end(),
-                                    [](const Thread& thread) { return !thread.stat; });
-    if (ended == process.threads.end()) return;
-    process.threads.erase(ended);
+  if (listed_.size() > KernelSampler::kMaxOthersOfProcess ||
+      elsewhere + listed_.size() > KernelSampler::kMaxOthers) {
+    std::erase_if(process.threads, [](const Thread& thread) { return !thread.isAudio; });
+    return;
   }
+  for (const Seen& seen : listed_) follow(process, seen.tid, false);
+}
+
+void AudioThreads::follow(Process& process, std::int32_t tid, bool isAudio) {
+  for (const Thread& thread : process.threads) {
+    if (thread.tid == tid && thread.isAudio == isAudio && thread.stat) return;
+  }
+  if (!makeRoom(process, isAudio)) return;
   const KernelPath directory = directoryOf(proc_, process.pid, tid);
   KernelFile stat(directory / "stat");
   if (!stat) return;
-  process.threads.push_back({tid, std::move(stat), KernelFile(directory / "schedstat"), false,
+  process.threads.push_back({tid, isAudio, std::move(stat), KernelFile(directory / "schedstat"), false,
                              std::chrono::nanoseconds(0), ThreadTimes(), 0,
                              MomentRing<ThreadMoment>(KernelSampler::kKept)});
+}
+
+// Only a thread that has ended gives its place, and the samples of it.
+bool AudioThreads::makeRoom(Process& process, bool isAudio) const {
+  std::size_t all = 0;
+  for (const Process& each : processes_) all += count(each, isAudio);
+  const bool isFull =
+      isAudio
+          ? count(process, true) >= KernelSampler::kMaxThreadsOfProcess || all >= KernelSampler::kMaxThreads
+          : count(process, false) >= KernelSampler::kMaxOthersOfProcess || all >= KernelSampler::kMaxOthers;
+  if (!isFull) return true;
+  const auto ended = std::find_if(process.threads.begin(), process.threads.end(), [&](const Thread& thread) {
+    return thread.isAudio == isAudio && !thread.stat;
+  });
+  if (ended == process.threads.end()) return false;
+  process.threads.erase(ended);
+  return true;
+}
+
+std::size_t AudioThreads::count(const Process& process, bool isAudio) {
+  return static_cast<std::size_t>(
+      std::count_if(process.threads.begin(), process.threads.end(),
+                    [&](const Thread& thread) { return thread.isAudio == isAudio; }));
 }
 
 void AudioThreads::sample(std::chrono::nanoseconds now) {
@@ -116,6 +154,7 @@ void AudioThreads::sample(std::int32_t pid, Thread& thread, std::chrono::nanosec
   ThreadMoment moment;
   moment.pid = pid;
   moment.tid = thread.tid;
+  moment.isAudio = thread.isAudio;
   moment.at = now;
   moment.state = stat->state;
   moment.policy = stat->policy;

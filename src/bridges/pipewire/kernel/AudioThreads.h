@@ -16,7 +16,8 @@
 
 namespace tonewerk {
 
-// Samples the audio threads of the processes that are watched (see KernelSampler.h).
+// Samples the audio threads of the processes that are watched, or all threads of a process without one (see
+// KernelSampler.h).
 class AudioThreads {
  public:
   static constexpr std::size_t kMaxProcesses = 64;
@@ -39,7 +40,8 @@ class AudioThreads {
  private:
   struct Thread {
     std::int32_t tid = 0;
-    KernelFile stat;  // both closed when the thread has ended; its samples stay
+    bool isAudio = true;  // see ThreadMoment
+    KernelFile stat;      // both closed when the thread has ended; its samples stay
     KernelFile times;
     bool hasSample = false;
     std::chrono::nanoseconds at{0};  // of the newest sample
@@ -51,6 +53,7 @@ class AudioThreads {
   struct Seen {
     std::int32_t tid = 0;
     int looks = 0;
+    bool isNamed = false;  // as an audio thread
   };
   struct Process {
     std::int32_t pid = 0;
@@ -60,7 +63,11 @@ class AudioThreads {
 
   void lookAt(Process& process);
   bool isAudio(std::int32_t pid, Seen& seen);
-  void follow(Process& process, std::int32_t tid);
+  // Follows all listed threads of a process whose audio thread is not known, or none.
+  void followOthers(Process& process);
+  void follow(Process& process, std::int32_t tid, bool isAudio);
+  bool makeRoom(Process& process, bool isAudio) const;
+  static std::size_t count(const Process& process, bool isAudio);
   void sample(std::int32_t pid, Thread& thread, std::chrono::nanoseconds now);
 
   const KernelCalls& calls_;

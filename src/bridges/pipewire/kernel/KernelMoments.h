@@ -21,6 +21,7 @@ struct ThreadName {
 struct ThreadMoment {
   std::int32_t pid = 0;            // of its process
   std::int32_t tid = 0;            // its own
+  bool isAudio = true;             // false: its process has no known audio thread, and any may be it
   std::chrono::nanoseconds at{0};  // monotonic time of the sample
   // How long the numbers below took to gather; 0 for the first sample of a thread, whose numbers are 0, too.
   std::chrono::nanoseconds interval{0};

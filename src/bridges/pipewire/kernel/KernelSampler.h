@@ -18,7 +18,9 @@ namespace tonewerk {
 // kKept samples. The answers to "who held the processor?" and "was it the storage?" come from here.
 //
 // A process's audio threads are those that PipeWire's library names ("data-loop...") and all at a real-time
-// policy. They are looked for when the process is first watched, and again about every second.
+// policy. They are looked for when the process is first watched, and again about every second. While a
+// process has none, all its threads are watched instead, since one of them must be it; none of them if they
+// are more than kMaxOthersOfProcess, because the one that matters might be missing.
 //
 // Files stay open between samples, and a sample allocates nothing unless threads have come or gone. A fact
 // that cannot be read (a process that ended or belongs to somebody else, a kernel without the file) is
@@ -27,8 +29,10 @@ class KernelSampler {
  public:
   static constexpr std::chrono::milliseconds kInterval{100};  // between calls of sample()
   static constexpr std::size_t kKept = 64;                    // samples
-  static constexpr std::size_t kMaxThreads = 128;             // that are watched, of all processes
+  static constexpr std::size_t kMaxThreads = 128;  // audio threads that are watched, of all processes
   static constexpr std::size_t kMaxThreadsOfProcess = 8;
+  static constexpr std::size_t kMaxOthers = 64;  // threads of processes without a known audio thread
+  static constexpr std::size_t kMaxOthersOfProcess = 16;
   static constexpr std::size_t kMaxRealTimeThreads = 64;  // of the machine, in which hogs are looked for
 
   // The directories that the kernel's files are in: "/proc" and "/sys", or copies of their layout in tests.

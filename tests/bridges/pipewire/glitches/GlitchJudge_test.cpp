@@ -14,6 +14,7 @@ using std::chrono::seconds;
 using ::testing::ElementsAre;
 using ::testing::HasSubstr;
 using ::testing::IsEmpty;
+using ::testing::Not;
 
 class GlitchJudgeTest : public ::testing::Test {
  protected:
@@ -221,6 +222,19 @@ TEST_F(GlitchJudgeTest, IsLessSureWhenTwoNodesWereLateAlike) {
   scene.evidence.cycles[kGlitch].nodes[0] = GlitchScene::awake(kPlayer, 1, 21);
   scene.evidence.cycles[kGlitch + 1].nodes[0] = GlitchScene::finishedBoth(kPlayer, 1, 8'000);
   EXPECT_LT(judge().confidence, sure);
+}
+
+TEST_F(GlitchJudgeTest, IsLessSureWhenTheAudioThreadIsNotKnown) {
+  scene.makeLate(kFilter, 30'000);
+  factsOf(kFilter) = {.ran = milliseconds(2), .waited = milliseconds(28)};
+  const Verdict sure = judge();
+  factsOf(kFilter).isThreadKnown = false;
+  const Verdict unsure = judge();
+  EXPECT_EQ(unsure.cause, GlitchCause::kNotScheduled);
+  EXPECT_NEAR(unsure.confidence, sure.confidence * 0.8, 1e-9);
+  EXPECT_THAT(unsure.reason, HasSubstr("audio thread is not known"));
+  factsOf(kFilter).isStopped = true;
+  EXPECT_THAT(judge().reason, Not(HasSubstr("not known")));
 }
 
 // A client that computes at a real-time priority keeps those beside it from their processor.

@@ -6,6 +6,7 @@
 #include <dirent.h>
 #include <gmock/gmock.h>
 #include <pthread.h>
+#include <set>
 #include <string>
 #include <unistd.h>
 #include <vector>
@@ -19,6 +20,7 @@ using std::chrono::milliseconds;
 using std::chrono::nanoseconds;
 using std::chrono::seconds;
 using testing::DoubleNear;
+using testing::ElementsAre;
 using testing::IsEmpty;
 using testing::SizeIs;
 
@@ -41,6 +43,11 @@ class KernelSamplerTest : public testing::Test {
   }
   std::vector<ThreadMoment> threads(std::int32_t pid) const {
     return sampler_.threadMoments(pid, nanoseconds(0), kEver);
+  }
+  std::vector<std::int32_t> watched(std::int32_t pid) const {
+    std::set<std::int32_t> found;
+    for (const ThreadMoment& moment : threads(pid)) found.insert(moment.tid);
+    return {found.begin(), found.end()};
   }
   std::vector<MachineMoment> machine() const { return sampler_.machineMoments(nanoseconds(0), kEver); }
   MachineMoment newest() const { return machine().back(); }
@@ -81,9 +88,7 @@ TEST_F(KernelSamplerTest, FollowsThreadsNamedByPipeWireAndRealTimeOnesOnly) {
   kernel_.set(7, 9, {.name = "mixer (1) S", .policy = SCHED_FIFO, .priority = 88});
   watch({7});
   sampler_.sample();
-  std::vector<std::int32_t> found;
-  for (const ThreadMoment& moment : threads(7)) found.push_back(moment.tid);
-  EXPECT_THAT(found, testing::UnorderedElementsAre(8, 9));
+  EXPECT_THAT(watched(7), ElementsAre(8, 9));
 }
 
 TEST_F(KernelSamplerTest, FindsThreadsThatAWatchedProcessStartsLater) {
@@ -92,7 +97,90 @@ TEST_F(KernelSamplerTest, FindsThreadsThatAWatchedProcessStartsLater) {
   sampleLater();
   kernel_.set(7, 8, {});
   for (int i = 0; i < 12; ++i) sampleLater();
-  EXPECT_THAT(threads(7), testing::Not(IsEmpty()));
+  EXPECT_THAT(watched(7), ElementsAre(8));
+  EXPECT_TRUE(threads(7).back().isAudio);
+}
+
+TEST_F(KernelSamplerTest, WatchesAllThreadsOfAProcessWithoutAKnownAudioThread) {
+  for (int tid = 7; tid < 10; ++tid) kernel_.set(7, tid, {.name = "player"});
+  watch({7});
+  sampleLater();
+  kernel_.set(7, 9, {.name = "player", .ranMs = 4, .waitedMs = 40});
+  sampleLater();
+  EXPECT_THAT(watched(7), ElementsAre(7, 8, 9));
+  nanoseconds waited{0};
+  for (const ThreadMoment& moment : threads(7)) {
+    EXPECT_FALSE(moment.isAudio);
+    if (moment.tid == 9) waited += moment.waited;
+  }
+  EXPECT_EQ(waited, milliseconds(40));
+}
+
+TEST_F(KernelSamplerTest, WatchesTheThreadsThatSuchAProcessStartsLater) {
+  kernel_.set(7, 7, {.name = "player"});
+  watch({7});
+  sampleLater();
+  kernel_.set(7, 8, {.name = "worker"});
+  for (int i = 0; i < 12; ++i) sampleLater();
+  EXPECT_THAT(watched(7), ElementsAre(7, 8));
+}
+
+TEST_F(KernelSamplerTest, WatchesTheOtherThreadsAgainWhenTheAudioThreadHasEnded) {
+  kernel_.set(7, 7, {.name = "player"});
+  kernel_.set(7, 8, {});
+  watch({7});
+  sampleLater();
+  kernel_.end(7, 8);
+  for (int i = 0; i < 12; ++i) sampleLater();
+  EXPECT_THAT(watched(7), ElementsAre(7, 8));
+  EXPECT_EQ(threads(7).back().tid, 7);
+  EXPECT_FALSE(threads(7).back().isAudio);
+}
+
+// Without the one that matters, the others would only mislead.
+TEST_F(KernelSamplerTest, WatchesNoneOfMoreThreadsThanItsLimits) {
+  constexpr int kMost = KernelSampler::kMaxOthersOfProcess;
+  for (int i = 0; i < kMost; ++i) kernel_.set(1, 100 + i, {.name = "player"});
+  watch({1});
+  sampleLater();
+  EXPECT_THAT(watched(1), SizeIs(kMost));
+  kernel_.set(1, 100 + kMost, {.name = "player"});
+  for (int i = 0; i < 12; ++i) sampleLater();
+  EXPECT_THAT(watched(1), IsEmpty());
+}
+
+TEST_F(KernelSamplerTest, WatchesAudioThreadsBesideAsManyOthersAsItMay) {
+  std::vector<std::int32_t> processes;
+  for (int pid = 1; pid <= 9; ++pid) {
+    processes.push_back(pid);
+    for (int i = 0; i < 10; ++i) kernel_.set(pid, pid * 100 + i, {.name = "player"});
+  }
+  kernel_.set(10, 1000, {});
+  processes.push_back(10);
+  watch(processes);
+  sampleLater();
+  std::size_t others = 0;
+  for (int pid = 1; pid <= 9; ++pid) {
+    EXPECT_THAT(watched(pid), testing::AnyOf(IsEmpty(), SizeIs(10)));
+    others += watched(pid).size();
+  }
+  EXPECT_EQ(others, 60u);
+  EXPECT_LE(others, KernelSampler::kMaxOthers);
+  EXPECT_THAT(watched(10), ElementsAre(1000));
+}
+
+// Threads that come and go leave no more samples behind than the limit allows.
+TEST_F(KernelSamplerTest, KeepsTheSamplesOfAFewOfManyThreadsThatEnded) {
+  constexpr int kMost = KernelSampler::kMaxOthersOfProcess;
+  kernel_.set(7, 7, {.name = "player"});
+  watch({7});
+  for (int tid = 100; tid < 100 + 2 * kMost; ++tid) {
+    kernel_.set(7, tid, {.name = "worker"});
+    for (int i = 0; i < 10; ++i) sampleLater();
+    kernel_.end(7, tid);
+  }
+  EXPECT_LE(watched(7).size(), KernelSampler::kMaxOthersOfProcess);
+  EXPECT_EQ(watched(7).front(), 7);
 }
 
 // Programs name a thread after they have started it.
@@ -246,8 +334,7 @@ TEST_F(KernelSamplerTest, GivesTheLongestHogsFirstAndNoMoreThanItsLimit) {
   std::vector<nanoseconds> ran;
   const MachineMoment moment = newest();
   for (const Hog& hog : moment.hogs()) ran.push_back(hog.ran);
-  EXPECT_THAT(ran,
-              testing::ElementsAre(milliseconds(19), milliseconds(18), milliseconds(17), milliseconds(16)));
+  EXPECT_THAT(ran, ElementsAre(milliseconds(19), milliseconds(18), milliseconds(17), milliseconds(16)));
 }
 
 TEST_F(KernelSamplerTest, FindsARealTimeProcessThatCameLaterWithinASecond) {
