@@ -25,6 +25,11 @@ std::int32_t processOf(const Properties& client, std::string_view key) {
   return std::max(numberOf<std::int32_t>(propertyOf(client, key)).value_or(0), 0);
 }
 
+// The server for PulseAudio's protocol is one process with a client for each application.
+bool speaksForAnother(const Properties& client) {
+  return propertyOf(client, kClientAPIKey) == "pipewire-pulse";
+}
+
 std::optional<DriverNode> driverOf(const Properties& node) {
   if (!isDriver(node) || !(isSink(node) || isSource(node))) return std::nullopt;
   const std::string_view name = propertyOf(node, kNodeNameKey);
@@ -145,8 +150,10 @@ NodeOwner GraphModel::ownerOf(std::uint32_t node) const {
   owner.application = applicationOf(properties, client);
   owner.binary = cleanText(propertyOf(client, kApplicationBinaryKey));
   owner.computingProcess = processOf(client, kSocketProcessKey);
-  owner.process = processOf(client, kApplicationProcessKey);
-  if (owner.process == 0) owner.process = owner.computingProcess;
+  const std::int32_t said = processOf(client, kApplicationProcessKey);
+  // What a process says of itself may be wrong, such as its number in a container.
+  const bool isKnown = owner.computingProcess != 0 && !speaksForAnother(client);
+  owner.process = isKnown || said == 0 ? owner.computingProcess : said;
   if (owner.computingProcess == 0) owner.computingProcess = owner.process;
   owner.isOutputStream = isOutputStream(properties);
   return owner;

@@ -28,10 +28,11 @@ class StreamObserver {
 
 // Says whose a node is.
 struct NodeOwner {
-  std::string name;          // of the node
-  std::string application;   // like a stream's; empty when it is not known
-  std::string binary;        // of its process, as the process says
-  std::int32_t process = 0;  // identifier of the application's process, 0 unknown
+  std::string name;         // of the node
+  std::string application;  // like a stream's; empty when it is not known
+  std::string binary;       // of its process, as the process says
+  // Identifier of the application's process, 0 unknown: as the kernel says, where it says so.
+  std::int32_t process = 0;
   // Identifier of the process in which the node computes, 0 unknown. It differs from `process` when the
   // application speaks to PipeWire through another process.
   std::int32_t computingProcess = 0;

@@ -23,6 +23,7 @@ inline constexpr std::string_view kApplicationBinaryKey = "application.process.b
 inline constexpr std::string_view kApplicationNameKey = "application.name";
 inline constexpr std::string_view kApplicationProcessKey = "application.process.id";  // as the process says
 inline constexpr std::string_view kSocketProcessKey = "pipewire.sec.pid";             // as the kernel says
+inline constexpr std::string_view kClientAPIKey = "client.api";  // of the library that the client uses
 inline constexpr std::string_view kClientIDKey = "client.id";
 inline constexpr std::string_view kLinkOutputNodeKey = "link.output.node";
 inline constexpr std::string_view kLinkInputNodeKey = "link.input.node";
@@ -31,7 +32,7 @@ inline constexpr std::string_view kLinkInputNodeKey = "link.input.node";
 inline constexpr std::array kUsedKeys = {
     kMediaClassKey,    kMediaRoleKey,     kNodeNameKey,          kNodeDescriptionKey, kNodeNickKey,
     kNodeDriverKey,    kApplicationIDKey, kApplicationBinaryKey, kApplicationNameKey, kApplicationProcessKey,
-    kSocketProcessKey, kClientIDKey,      kLinkOutputNodeKey,    kLinkInputNodeKey};
+    kSocketProcessKey, kClientAPIKey,     kClientIDKey,          kLinkOutputNodeKey,  kLinkInputNodeKey};
 
 // Empty when the property is missing.
 std::string_view propertyOf(const Properties& properties, std::string_view key);

@@ -258,10 +258,21 @@ TEST_F(GraphModelTest, KnowsWhoseANodeIs) {
   const NodeOwner owner = model.ownerOf(60);
   EXPECT_EQ(owner.name, "filter");
   EXPECT_EQ(owner.application, "player");
-  EXPECT_EQ(owner.process, 77);
+  EXPECT_EQ(owner.process, 78);
   EXPECT_EQ(owner.computingProcess, 78);
   EXPECT_FALSE(owner.isOutputStream);
   EXPECT_EQ(model.ownerOf(61).name, "");
+}
+
+TEST_F(GraphModelTest, TakesTheProcessThatAnApplicationSaysOnlyWhereTheKernelDoesNotKnowIt) {
+  model.nodeAppeared(60, properties({{kClientIDKey, "30"}}));
+  model.clientDescribed(kClient, properties({{kApplicationProcessKey, "77"}}));
+  EXPECT_EQ(model.ownerOf(60).process, 77);
+  EXPECT_EQ(model.ownerOf(60).computingProcess, 77);
+  // The kernel knows only the server through which it speaks.
+  model.clientDescribed(kClient, properties({{kSocketProcessKey, "78"}, {kClientAPIKey, "pipewire-pulse"}}));
+  EXPECT_EQ(model.ownerOf(60).process, 77);
+  EXPECT_EQ(model.ownerOf(60).computingProcess, 78);
 }
 
 TEST_F(GraphModelTest, KnowsNoProcessWhenAClientGivesNonsenseForIt) {
