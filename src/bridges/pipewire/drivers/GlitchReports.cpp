@@ -320,18 +320,27 @@ GlitchEvidence GlitchReports::evidenceOf(std::uint32_t driver, const GlitchWatch
   const nanoseconds to = evidence.cycles.back().cycle.end();
   evidence.links = linksSince(from);
   evidence.shapeChanges = shapeChanges_;
+  std::map<std::int32_t, nanoseconds> usual;  // how long the nodes of a process usually compute in a cycle
   for (const GlitchCycle& cycle : evidence.cycles) {
     for (const KeptNode& part : cycle.nodes) {
       const auto [name, isNew] = evidence.names.try_emplace(part.node);
       if (!isNew) continue;
       const NodeOwner& owner = ownerOf(part.node);
       name->second = owner.name;
-      if (const auto usual = watch.usualOf(part.node)) evidence.usual.emplace(part.node, *usual);
+      if (const auto times = watch.usualOf(part.node)) {
+        evidence.usual.emplace(part.node, *times);
+        usual[owner.computingProcess] += nanoseconds(times->compute);
+      }
       if (owner.computingProcess == 0) continue;
       if (const auto facts = facts_.process(owner.computingProcess, from, to)) {
         evidence.processes.emplace(part.node, *facts);
       }
     }
+  }
+  for (auto& [node, facts] : evidence.processes) {
+    const double cycles = millisecondsOf(facts.interval) / millisecondsOf(glitch.cycle.period);
+    facts.usuallyRuns =
+        std::chrono::duration_cast<nanoseconds>(usual[ownerOf(node).computingProcess] * cycles);
   }
   evidence.machine = facts_.machine(from, to);
   return evidence;

@@ -35,6 +35,7 @@ void KernelFacts::audioRuns(std::span<const std::int32_t> processes) {
 std::optional<ProcessFacts> KernelFacts::process(std::int32_t process, std::chrono::nanoseconds from,
                                                  std::chrono::nanoseconds to) const {
   struct Sums {
+    std::chrono::nanoseconds interval{0};
     std::chrono::nanoseconds ran{0};
     std::chrono::nanoseconds waited{0};
   };
@@ -47,6 +48,7 @@ std::optional<ProcessFacts> KernelFacts::process(std::int32_t process, std::chro
   for (const ThreadMoment& moment : moments) {
     if (moment.isAudio != facts.isThreadKnown) continue;
     Sums& sums = threads[moment.tid];
+    sums.interval += moment.interval;
     sums.ran += moment.ran;
     sums.waited += moment.waited;
     facts.majorFaults += moment.majorFaults;
@@ -58,6 +60,7 @@ std::optional<ProcessFacts> KernelFacts::process(std::int32_t process, std::chro
   }
   if (!hasNumbers) return std::nullopt;
   for (const auto& [thread, sums] : threads) {
+    facts.interval = std::max(facts.interval, sums.interval);
     facts.ran = std::max(facts.ran, sums.ran);
     facts.waited = std::max(facts.waited, sums.waited);
   }

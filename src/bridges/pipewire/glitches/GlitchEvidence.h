@@ -35,6 +35,8 @@ struct ProcessFacts {
   bool isWaitingForDevice = false;     // a thread was in an uninterruptible sleep
   bool isRealTime = true;              // all its audio threads have a real-time policy
   bool isThreadKnown = true;  // false: all this is of any threads of the process; one is its audio thread
+  std::chrono::nanoseconds interval{0};     // that all this is about, longer than the glitch
+  std::chrono::nanoseconds usuallyRuns{0};  // its nodes in such an interval; estimated from their cycles
 };
 
 // Somebody who kept a processor busy at a real-time policy.

@@ -43,7 +43,8 @@ struct Delay {
   nanoseconds from{0};    // monotonic time of its signal, or of its waking
   nanoseconds to{0};      // of its waking, or of its end
   nanoseconds usual{0};
-  bool isOpen = false;  // it has not come to an end
+  bool isOpen = false;     // it has not come to an end
+  nanoseconds handing{0};  // of all this: from its finish until it had signalled the next
 
   nanoseconds length() const { return to - from; }
   nanoseconds excess() const { return std::max(length() - usual, nanoseconds(0)); }
@@ -163,6 +164,7 @@ class Judge {
     add(delayOf(root));
     std::set<std::uint32_t> seen{root.node};
     const KeptNode* part = before(root);
+    const KeptNode* next = &root;
     while (part != nullptr && seen.insert(part->node).second) {
       const nanoseconds begin = glitch().cycle.begin;
       const UsualTimes usual = usualOf(part->node);
@@ -171,9 +173,12 @@ class Judge {
              nanoseconds(usual.wait), false});
       }
       if (part->awake != KeptNode::kNever && part->finish != KeptNode::kNever) {
-        add({part->node, false, begin + nanoseconds(part->awake), begin + nanoseconds(part->finish),
-             nanoseconds(usual.compute), false});
+        // It notes its finish before it signals the next, and can lose its processor in between.
+        const std::int32_t end = std::max(part->finish, next->signal);
+        add({part->node, false, begin + nanoseconds(part->awake), begin + nanoseconds(end),
+             nanoseconds(usual.compute), false, nanoseconds(end - part->finish)});
       }
+      next = part;
       part = before(*part);
     }
   }
@@ -237,12 +242,18 @@ class Judge {
     return delay;
   }
 
+  // Whether its thread ran for at least half of the time that the node took beyond the usual. A sample is
+  // about many cycles, in which it ran as usual, too.
+  static bool hasRun(const Delay& delay, const ProcessFacts& facts) {
+    return (facts.ran - facts.usuallyRuns) * 2 >= delay.excess();
+  }
+
   // How much a delay counts. Of two that are about as long, the node that had a processor kept the other from
   // it.
   double weightOf(const Delay& delay) const {
     const double excess = millisecondsOf(delay.excess());
     const ProcessFacts* facts = factsOf(delay.node);
-    const bool ran = !delay.isWaking && facts != nullptr && facts->ran * 2 >= delay.length();
+    const bool ran = !delay.isWaking && facts != nullptr && hasRun(delay, *facts);
     return ran ? excess * 1.5 : excess;
   }
 
@@ -286,7 +297,7 @@ class Judge {
           .cause = GlitchCause::kStuck, .confidence = 0.95, .reason = figures + "; its process was stopped."};
     }
     if (facts->waited * 2 >= length) return notScheduled(delay, *facts, figures);
-    if (facts->ran * 2 >= length) {
+    if (hasRun(delay, *facts)) {
       return {.cause = GlitchCause::kLate,
               .confidence = 0.7,
               .reason = figures + formatted("; meanwhile it ran for %.2f ms with something else.",
@@ -306,6 +317,8 @@ class Judge {
         formatted("%s took %s%.2f ms for its part (usually %.3f ms; the period is %.2f ms)",
                   nameOf(delay.node), delay.isOpen ? "more than " : "", millisecondsOf(length),
                   millisecondsOf(delay.usual), millisecondsOf(glitch().cycle.period));
+    if (delay.handing * 2 >= length && (facts == nullptr || !facts->isStopped))
+      return handing(delay, figures);
     const bool hangs = delay.isOpen && length >= kHanging;
     if (facts == nullptr) {
       return {.cause = hangs ? GlitchCause::kStuck : GlitchCause::kLate,
@@ -318,7 +331,7 @@ class Judge {
     }
     if (facts->waited * 2 >= length && facts->waited > facts->ran)
       return notScheduled(delay, *facts, figures);
-    if (facts->ran * 2 >= length) {
+    if (hasRun(delay, *facts)) {
       return {.cause = GlitchCause::kLate,
               .confidence = 0.95,
               .reason =
@@ -336,6 +349,18 @@ class Judge {
             .confidence = 0.85,
             .reason = figures + formatted("; it ran for %.2f ms and waited for something else for the rest.",
                                           millisecondsOf(facts->ran))};
+  }
+
+  // Between its finish and its signal to the next a node has nothing to wait for but a processor.
+  Verdict handing(const Delay& delay, const std::string& figures) const {
+    const std::string more =
+        formatted("; it had finished %.2f ms before it signalled the next", millisecondsOf(delay.handing));
+    const ProcessFacts* facts = factsOf(delay.node);
+    if (facts != nullptr && facts->waited * 2 >= delay.handing)
+      return notScheduled(delay, *facts, figures + more);
+    return {.cause = GlitchCause::kNotScheduled,
+            .confidence = 0.6,
+            .reason = figures + more + ", so its thread had no processor."};
   }
 
   // Somebody else who kept a processor busy; not a node of the graph that did what it is for.

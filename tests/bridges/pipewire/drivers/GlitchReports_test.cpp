@@ -207,6 +207,16 @@ TEST_F(GlitchReportsTest, NamesTheProcessThatHeldTheProcessor) {
   EXPECT_EQ(overload.text("glitch_node"), "first");
 }
 
+// The two nodes of the process compute for 40 us in each cycle of 20 ms: 40 ms in ten seconds.
+TEST_F(GlitchReportsTest, KnowsHowLongTheNodesOfAProcessUsuallyRun) {
+  model.clientDescribed(kSecond + 1000, {{std::string(kSocketProcessKey), "1001"}});
+  facts.processes[1001] = {.ran = milliseconds(45), .interval = std::chrono::seconds(10)};
+  runLate({kFirst, kFilter});
+  run(2);
+  report();
+  EXPECT_THAT(onlyOverload(0).text("glitch_reason"), HasSubstr("ran for 45.00 ms and waited for something"));
+}
+
 // The report of the profiler ends before it is known how long the node needs.
 TEST_F(GlitchReportsTest, JudgesAGlitchThatIsNotOverWithTheNextReport) {
   runLate({kFirst, kFilter});

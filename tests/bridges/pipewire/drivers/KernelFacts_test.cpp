@@ -53,6 +53,7 @@ TEST_F(KernelFactsTest, AddsTheSamplesOfEachThreadUpAndTakesTheLongestTimes) {
   ASSERT_TRUE(player());
   EXPECT_EQ(player()->ran, milliseconds(25));
   EXPECT_EQ(player()->waited, milliseconds(41));
+  EXPECT_EQ(player()->interval, milliseconds(200));
   EXPECT_EQ(player()->majorFaults, 5U);
   EXPECT_TRUE(player()->isThreadKnown);
 }

@@ -109,6 +109,34 @@ TEST_F(GlitchJudgeTest, SaysThatANodeIsStuckThatNeitherRanNorWaitedForAProcessor
   EXPECT_EQ(judge().cause, GlitchCause::kStuck);
 }
 
+// A sample of the kernel's is about many cycles.
+TEST_F(GlitchJudgeTest, DoesNotTakeWhatANodeRunsInOtherCyclesForItsGlitch) {
+  scene.set(kGlitch, {GlitchScene::signalled(kPlayer, 1), GlitchScene::waiting(kFilter),
+                      GlitchScene::waiting(kOutput)});
+  scene.set(kGlitch + 1, {GlitchScene::finished(kPlayer, 1, 9'000, 9'010),
+                          GlitchScene::finished(kFilter, 9'020, 9'040, 9'050),
+                          GlitchScene::finished(kOutput, 9'060, 9'080, 9'090)});
+  factsOf(kPlayer) = {.ran = milliseconds(40), .usuallyRuns = milliseconds(39)};
+  EXPECT_EQ(judge().cause, GlitchCause::kStuck);
+  factsOf(kPlayer).usuallyRuns = milliseconds(20);
+  EXPECT_EQ(judge().cause, GlitchCause::kLate);
+}
+
+// It notes its finish and loses its processor before it has signalled the output.
+TEST_F(GlitchJudgeTest, BlamesANodeThatSignalledTheNextLongAfterItHadFinished) {
+  scene.set(kGlitch, {GlitchScene::finished(kPlayer, 1, 21, 31), GlitchScene::finished(kFilter, 40, 60, 70),
+                      GlitchScene::signalled(kOutput, 25'000)});
+  scene.set(kGlitch + 1,
+            {GlitchScene::finished(kPlayer, 1, 21, 31), GlitchScene::finished(kFilter, 40, 60, 70),
+             GlitchScene::finished(kOutput, 80, 100, 110)});
+  EXPECT_EQ(judge().culprit, kFilter);
+  EXPECT_EQ(judge().cause, GlitchCause::kNotScheduled);
+  EXPECT_THAT(judge().reason, HasSubstr("finished 24.93 ms before it signalled the next"));
+  factsOf(kFilter) = {.ran = milliseconds(1), .waited = milliseconds(25)};
+  scene.evidence.machine.holders = {{77, "hog", 90, milliseconds(80)}};
+  EXPECT_EQ(judge().holder, 77);
+}
+
 TEST_F(GlitchJudgeTest, SaysThatANodeThatWaitedForStorageWasLateForIt) {
   scene.makeLate(kFilter, 50'000);
   factsOf(kFilter) = {.ran = milliseconds(1), .majorFaults = 3};
