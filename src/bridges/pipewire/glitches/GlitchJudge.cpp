@@ -162,16 +162,15 @@ class Judge {
   // Adds the delays of an unfinished node, and of those that it had to wait for.
   void followBack(const KeptNode& root) {
     add(delayOf(root));
+    // One that is awake may have woken so late that it could not finish.
+    if (root.stage == NodeTimes::kAwake) addWaking(root);
     std::set<std::uint32_t> seen{root.node};
     const KeptNode* part = before(root);
     const KeptNode* next = &root;
     while (part != nullptr && seen.insert(part->node).second) {
       const nanoseconds begin = glitch().cycle.begin;
       const UsualTimes usual = usualOf(part->node);
-      if (part->awake != KeptNode::kNever && part->signal != KeptNode::kNever) {
-        add({part->node, true, begin + nanoseconds(part->signal), begin + nanoseconds(part->awake),
-             nanoseconds(usual.wait), false});
-      }
+      addWaking(*part);
       if (part->awake != KeptNode::kNever && part->finish != KeptNode::kNever) {
         // It notes its finish before it signals the next, and can lose its processor in between.
         const std::int32_t end = std::max(part->finish, next->signal);
@@ -181,6 +180,13 @@ class Judge {
       next = part;
       part = before(*part);
     }
+  }
+
+  void addWaking(const KeptNode& part) {
+    if (part.awake == KeptNode::kNever || part.signal == KeptNode::kNever) return;
+    const nanoseconds begin = glitch().cycle.begin;
+    add({part.node, true, begin + nanoseconds(part.signal), begin + nanoseconds(part.awake),
+         nanoseconds(usualOf(part.node).wait)});
   }
 
   void add(const Delay& delay) {

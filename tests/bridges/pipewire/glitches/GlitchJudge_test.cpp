@@ -109,6 +109,19 @@ TEST_F(GlitchJudgeTest, SaysThatANodeIsStuckThatNeitherRanNorWaitedForAProcessor
   EXPECT_EQ(judge().cause, GlitchCause::kStuck);
 }
 
+TEST_F(GlitchJudgeTest, BlamesANodeThatWokeTooLateToFinish) {
+  scene.set(kGlitch, {GlitchScene::finished(kPlayer, 1, 21, 60), GlitchScene::awake(kFilter, 70, 21'300),
+                      GlitchScene::waiting(kOutput)});
+  scene.set(kGlitch + 1,
+            {GlitchScene::finished(kPlayer, 1, 21, 31), GlitchScene::finished(kFilter, 40, 60, 70),
+             GlitchScene::finished(kOutput, 80, 100, 110)});
+  factsOf(kFilter) = {.ran = milliseconds(1), .waited = milliseconds(21)};
+  const Verdict verdict = judge();
+  EXPECT_EQ(verdict.culprit, kFilter);
+  EXPECT_EQ(verdict.cause, GlitchCause::kNotScheduled);
+  EXPECT_THAT(verdict.reason, HasSubstr("did not wake for 21.23 ms"));
+}
+
 // A sample of the kernel's is about many cycles.
 TEST_F(GlitchJudgeTest, DoesNotTakeWhatANodeRunsInOtherCyclesForItsGlitch) {
   scene.set(kGlitch, {GlitchScene::signalled(kPlayer, 1), GlitchScene::waiting(kFilter),
