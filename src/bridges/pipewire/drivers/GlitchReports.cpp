@@ -337,12 +337,20 @@ GlitchEvidence GlitchReports::evidenceOf(std::uint32_t driver, const GlitchWatch
       }
     }
   }
+  const auto usualIn = [&](std::int32_t process, nanoseconds interval) {
+    const double cycles = millisecondsOf(interval) / millisecondsOf(glitch.cycle.period);
+    return std::chrono::duration_cast<nanoseconds>(usual[process] * cycles);
+  };
   for (auto& [node, facts] : evidence.processes) {
-    const double cycles = millisecondsOf(facts.interval) / millisecondsOf(glitch.cycle.period);
-    facts.usuallyRuns =
-        std::chrono::duration_cast<nanoseconds>(usual[ownerOf(node).computingProcess] * cycles);
+    facts.usuallyRuns = usualIn(ownerOf(node).computingProcess, facts.interval);
   }
   evidence.machine = facts_.machine(from, to);
+  std::vector<ProcessorHolder>& holders = evidence.machine.holders;
+  for (ProcessorHolder& holder : holders) {
+    if (usual.contains(holder.process)) holder.ran -= usualIn(holder.process, evidence.machine.interval);
+  }
+  std::stable_sort(holders.begin(), holders.end(),
+                   [](const ProcessorHolder& a, const ProcessorHolder& b) { return a.ran > b.ran; });
   return evidence;
 }
 

@@ -44,7 +44,7 @@ struct ProcessorHolder {
   std::int32_t process = 0;
   std::string name{};  // of the process
   int priority = 0;
-  std::chrono::nanoseconds ran{0};
+  std::chrono::nanoseconds ran{0};  // of a process with nodes: longer than these usually do
 };
 
 // What the kernel said about the machine around a glitch.
@@ -55,8 +55,8 @@ struct MachineFacts {
   std::chrono::nanoseconds ioStall{0};
   std::chrono::nanoseconds slept{0};
   bool isThrottled = false;
-  std::uint32_t frequencyPerMille = 0;  // 0 unknown
-  std::vector<ProcessorHolder> holders;
+  std::uint32_t frequencyPerMille = 0;     // 0 unknown
+  std::vector<ProcessorHolder> holders{};  // who ran longest first
 };
 
 // Everything that is known about one glitch.

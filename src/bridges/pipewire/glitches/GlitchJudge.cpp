@@ -369,9 +369,11 @@ class Judge {
             .reason = figures + more + ", so its thread had no processor."};
   }
 
-  // Somebody else who kept a processor busy; not a node of the graph that did what it is for.
-  const ProcessorHolder* holder() const {
-    return evidence_.machine.holders.empty() ? nullptr : &evidence_.machine.holders.front();
+  // Somebody else who kept a processor busy for at least half of the time that was lost.
+  const ProcessorHolder* holderIn(const Delay& delay) const {
+    const std::vector<ProcessorHolder>& holders = evidence_.machine.holders;
+    if (holders.empty() || holders.front().ran * 2 < delay.excess()) return nullptr;
+    return &holders.front();
   }
 
   Verdict notScheduled(const Delay& delay, const ProcessFacts& facts, const std::string& figures) const {
@@ -379,7 +381,7 @@ class Judge {
     verdict.reason =
         figures + formatted("; it waited for a processor for %.2f ms", millisecondsOf(facts.waited));
     if (!facts.isRealTime) verdict.reason += ", without a real-time priority";
-    if (const ProcessorHolder* holder = this->holder(); holder != nullptr && holder->process != 0) {
+    if (const ProcessorHolder* holder = holderIn(delay); holder != nullptr && holder->process != 0) {
       verdict.holder = holder->process;
       verdict.holderName = holder->name;
       verdict.reason += formatted(", while %s ran for %.1f ms at real-time priority %d", holder->name.c_str(),

@@ -207,6 +207,17 @@ TEST_F(GlitchReportsTest, NamesTheProcessThatHeldTheProcessor) {
   EXPECT_EQ(overload.text("glitch_node"), "first");
 }
 
+// The second player computes for 40 us in each cycle of 20 ms: 20 ms in ten seconds.
+TEST_F(GlitchReportsTest, DoesNotNameANodeThatRanAsUsualForHoldingTheProcessor) {
+  facts.processes[1001] = {.waited = milliseconds(30)};
+  facts.machineFacts.interval = std::chrono::seconds(10);
+  facts.machineFacts.holders = {{1002, "player", 88, milliseconds(24)}, {77, "hog", 90, milliseconds(15)}};
+  runLate({kFirst, kFilter});
+  run(2);
+  report();
+  EXPECT_EQ(onlyOverload(0).integer("glitch_culprit_pid"), 77);
+}
+
 // The two nodes of the process compute for 40 us in each cycle of 20 ms: 40 ms in ten seconds.
 TEST_F(GlitchReportsTest, KnowsHowLongTheNodesOfAProcessUsuallyRun) {
   model.clientDescribed(kSecond + 1000, {{std::string(kSocketProcessKey), "1001"}});

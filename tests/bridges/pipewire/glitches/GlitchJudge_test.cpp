@@ -76,6 +76,16 @@ TEST_F(GlitchJudgeTest, SaysThatANodeWasNotScheduledThatWokeLateAndWaitedForAPro
   EXPECT_THAT(verdict.reason, HasSubstr("without a real-time priority"));
 }
 
+TEST_F(GlitchJudgeTest, NamesNobodyWhoRanForTooShortToHaveHeldTheProcessor) {
+  scene.makeLate(kFilter, 30'000);
+  factsOf(kFilter) = {.ran = milliseconds(2), .waited = milliseconds(28)};
+  scene.evidence.machine.holders = {{77, "busy", 90, milliseconds(14)}};
+  EXPECT_EQ(judge().cause, GlitchCause::kNotScheduled);
+  EXPECT_EQ(judge().holder, 0);
+  scene.evidence.machine.holders[0].ran = milliseconds(16);
+  EXPECT_EQ(judge().holder, 77);
+}
+
 TEST_F(GlitchJudgeTest, SaysThatANodeWasNotScheduledThatLostItsProcessorWhileItComputed) {
   scene.makeLate(kFilter, 30'000);
   factsOf(kFilter) = {.ran = milliseconds(2), .waited = milliseconds(28)};
