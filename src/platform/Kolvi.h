@@ -15,7 +15,8 @@ namespace tonewerk {
 
 // One interval of a signpost, from its begin to its end.
 struct KolviEvent {
-  std::uint64_t timeDuration = 0;  // in the traced system's own unit of time
+  std::uint64_t timeDuration = 0;   // in the traced system's own unit of time
+  std::optional<double> beginTime;  // in seconds since 1970; none when the trace does not say it
 };
 
 // One question of a probe list about a trace, with its answer. Probes form a tree.

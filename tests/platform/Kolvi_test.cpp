@@ -11,7 +11,7 @@ using ::testing::IsEmpty;
 using ::testing::SizeIs;
 
 // Returns one event for each signpost; its duration is the length of the signpost's name.
-std::vector<KolviEvent> lengthOf(const std::string& signpost) { return {{signpost.size()}}; }
+std::vector<KolviEvent> lengthOf(const std::string& signpost) { return {{signpost.size(), {}}}; }
 
 ValueMap interval(const char* name) { return {{"name", name}, {"type", "interval"}}; }
 

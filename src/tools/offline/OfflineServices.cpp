@@ -156,8 +156,7 @@ std::unique_ptr<KolviModel> OfflineKolvi::openModel(const std::string& /*traceLo
 }
 
 std::unique_ptr<BenchfileWriter> OfflineBenchfile::open(const std::string& /*path*/,
-                                                        std::string_view /*dataName*/, int /*resultsVersion*/,
-                                                        int& systemError) {
+                                                        const BenchfileFacts& /*facts*/, int& systemError) {
   systemError = ENOENT;
   return nullptr;
 }

@@ -99,8 +99,8 @@ class OfflineKolvi final : public Kolvi {
 
 class OfflineBenchfile final : public Benchfile {
  public:
-  [[nodiscard]] std::unique_ptr<BenchfileWriter> open(const std::string& path, std::string_view dataName,
-                                                      int resultsVersion, int& systemError) override;
+  [[nodiscard]] std::unique_ptr<BenchfileWriter> open(const std::string& path, const BenchfileFacts& facts,
+                                                      int& systemError) override;
 };
 
 // No command is found.

@@ -33,7 +33,7 @@ void SignpostPairs::close(std::vector<std::int64_t>& begins, const SignpostEvent
   const std::int64_t nanoseconds = std::max<std::int64_t>(0, event.nanoseconds - begins.back());
   begins.pop_back();
   --openCount_;
-  intervals_.push_back({name, static_cast<std::uint64_t>(nanoseconds)});
+  intervals_.push_back({name, static_cast<std::uint64_t>(nanoseconds), event.nanoseconds});
 }
 
 }  // namespace tonewerk

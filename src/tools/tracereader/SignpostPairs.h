@@ -18,7 +18,7 @@ struct SignpostEvent {
   std::uint64_t identifier = 0;
   std::int64_t process = 0;
   std::int64_t thread = 0;
-  std::int64_t nanoseconds = 0;  // since an arbitrary fixed time
+  std::int64_t nanoseconds = 0;  // since 1970, by the tracer's clock
 };
 
 // Makes intervals from begins and ends with the same name, identifier, process and thread. An end belongs to
@@ -28,8 +28,9 @@ class SignpostPairs {
   static constexpr std::size_t kMaxOpen = 1'000'000;
 
   struct Interval {
-    std::size_t name;  // index into names()
-    std::uint64_t nanoseconds;
+    std::size_t name;           // index into names()
+    std::uint64_t nanoseconds;  // how long it lasted
+    std::int64_t end;           // since 1970
   };
 
   // Events must be added in the order of time. False if kMaxOpen begins have no end yet; the event is not

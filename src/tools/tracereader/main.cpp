@@ -4,12 +4,14 @@
 // process, because a damaged trace can make its reader hang or crash.
 //
 //   name decode          the next name, counted from 0; "\\" and "\n" stand for a backslash and a newline
-//   0 1523411            the duration of an interval with name 0, in nanoseconds
+//   0 1523411 20411      an interval with name 0: its duration, and its end since that of the one before,
+//                        both in nanoseconds; the first one's end is since 1970
 //   end                  the last line
 //
 // If the trace cannot be used, it writes "problem TEXT" instead and exits with status 1. Wrong usage gives
 // status 2.
 
+#include <cstdint>
 #include <cstdio>
 #include <string>
 
@@ -34,8 +36,11 @@ std::string escaped(const std::string& name) {
 
 bool print(const tonewerk::SignpostPairs& pairs) {
   for (const std::string& name : pairs.names()) std::printf("name %s\n", escaped(name).c_str());
+  std::int64_t previousEnd = 0;
   for (const auto& interval : pairs.intervals()) {
-    std::printf("%zu %llu\n", interval.name, static_cast<unsigned long long>(interval.nanoseconds));
+    std::printf("%zu %llu %lld\n", interval.name, static_cast<unsigned long long>(interval.nanoseconds),
+                static_cast<long long>(interval.end - previousEnd));
+    previousEnd = interval.end;
   }
   std::printf("end\n");
   return std::fflush(stdout) == 0 && std::ferror(stdout) == 0;

@@ -53,7 +53,9 @@ const Platform& platform() { return TWReportingContext::current().platform(); }
 }  // namespace
 
 TraceBenchfile::TraceBenchfile(const TWReportingSession& session)
-    : configuration_(session.configuration()), serviceName_(session.serviceName()) {}
+    : configuration_(session.configuration()),
+      serviceName_(session.serviceName()),
+      reporterID_(session.reporterID()) {}
 
 TraceBenchfile::~TraceBenchfile() = default;
 
@@ -109,7 +111,10 @@ void TraceBenchfile::createBDWriter() {
   tempWriterPath_ = platform().temporaryDirectory + "/" + std::string(kTemporaryName);
   debugLog(TWReportingTraceCategory(), "tempWriterPath: %@", tempWriterPath_);
   int systemError = 0;
-  mWriter_ = platform().benchfile.open(tempWriterPath_, kBenchfileName, kResultsVersion, systemError);
+  mWriter_ = platform().benchfile.open(
+      tempWriterPath_,
+      {.dataName = kBenchfileName, .resultsVersion = kResultsVersion, .reporterID = reporterID_},
+      systemError);
   if (mWriter_ != nullptr) return;
   errorLog(TWReportingTraceCategory(), "Failed to open benchfile writer. errno: %d", systemError);
 }
@@ -128,7 +133,7 @@ void TraceBenchfile::processProbe(const KolviProbe& probe, const KolviModel& mod
     const double milliseconds =
         model.timeModel().secondsFromSystemTimeDuration(event.timeDuration) * kMillisecondsPerSecond;
     debugLog(TWReportingTraceCategory(), "name:%@ time:%f ms", probe.name, milliseconds);
-    if (mWriter_ != nullptr) mWriter_->newValue(probe.name, milliseconds);
+    if (mWriter_ != nullptr) mWriter_->newValue(probe.name, milliseconds, event.beginTime);
   }
 }
 

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #pragma once
 
+#include <cstdint>
 #include <memory>
 #include <optional>
 #include <string>
@@ -36,6 +37,7 @@ class TraceBenchfile {
 
   const ValueMap configuration_;
   const std::string serviceName_;
+  const std::int64_t reporterID_;
   std::unique_ptr<BenchfileWriter> mWriter_;
   std::string directory_;
   std::string mOutputFile_;

@@ -2,6 +2,7 @@
 //
 // Tests a test session's trace, from a program's signposts to the benchmark data file, with the real tracer.
 #include <algorithm>
+#include <chrono>
 #include <filesystem>
 #include <fstream>
 #include <nlohmann/json.hpp>
@@ -24,6 +25,11 @@ constexpr AudioServiceType kTest = 11;
 constexpr double kNanosecondsPerMillisecond = 1e6;
 // The trace's nanoseconds are converted to seconds and to milliseconds before they reach the file.
 constexpr double kRounding = 1.0;
+constexpr double kClockError = 0.1;  // seconds
+
+double secondsNow() {
+  return std::chrono::duration<double>(std::chrono::system_clock::now().time_since_epoch()).count();
+}
 
 // A program's measurements of the intervals of one name; each list is in ascending order.
 struct Measured {
@@ -103,15 +109,23 @@ class PerformanceTraceTest : public DaemonTest {
 TEST_F(PerformanceTraceTest, ATestSessionLeavesHowLongItsIntervalsTook) {
   DaemonClient client = startTracing(
       R"([{"name": "decode", "type": "interval", "children": [{"name": "mix", "type": "interval"}]}])");
+  const double before = secondsNow();
   const auto output = outputOf(
       {TONEWERK_SIGNPOST_PROGRAM, {"2", "250"}, {{"TONEWERK_SIGNPOSTS", TONEWERK_SIGNPOST_LIBRARY}}});
   ASSERT_TRUE(output.has_value());
+  const double after = secondsNow();
   client.stop(kSession);
 
   const json found = file();
   EXPECT_EQ(found.at("context").at("data_name"), "TWReporting");
   EXPECT_EQ(found.at("context").at("results_version"), 4);
+  EXPECT_EQ(found.at("context").at("reporter_id"), kSession);
   EXPECT_THAT(found.at("benchmarks"), SizeIs(1000));
+  for (const json& entry : found.at("benchmarks")) {
+    // The tracer reads the difference of its clock to the time of day only once, and not at the same instant.
+    EXPECT_GT(entry.at("begin").get<double>(), before - kClockError);
+    EXPECT_LT(entry.at("begin").get<double>(), after + kClockError);
+  }
   for (const char* name : {"decode", "mix"}) {
     const Measured measured = measuredOf(*output, name);
     const std::vector<double> traced = durations(found, name);

@@ -44,6 +44,8 @@ TEST_F(SignpostPairsTest, IntervalsComeInTheOrderOfTheirEnds) {
   end("inner", 20);
   end("outer", 100);
   EXPECT_THAT(intervals(), ElementsAre(Pair("inner", 10), Pair("outer", 100)));
+  EXPECT_EQ(pairs_.intervals().at(0).end, 20);
+  EXPECT_EQ(pairs_.intervals().at(1).end, 100);
 }
 
 TEST_F(SignpostPairsTest, NestedIntervalsOfOneNameCloseTheNewestFirst) {

@@ -317,6 +317,14 @@ TEST_F(TWReportingSessionTraceWorkerTest, ASessionStartedAgainTracesAgain) {
             "TWReporting 4\ndecode 3\n");
 }
 
+TEST_F(TWReportingSessionTraceWorkerTest, TheFileSaysWhoseItIsAndWhenTheIntervalsBegan) {
+  test.kolvi.beginTime = 1763633880.5;
+  session->start();
+  session->stop();
+  EXPECT_EQ(benchfile(), "TWReporting 4\ndecode 1.5 at 1763633880.5\ndecode 0.25 at 1763633880.5\n");
+  EXPECT_EQ(test.benchfile.reporterID, 77);
+}
+
 // The worker must not take the completion of an earlier run for the one that it waits for.
 TEST_F(TWReportingSessionTraceWorkerTest, ALateCallbackOfAnEarlierRunDoesNotChangeThisOne) {
   test.runtrace.onStop({});

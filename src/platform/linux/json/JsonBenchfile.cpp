@@ -39,7 +39,7 @@ class JsonBenchfileWriter final : public BenchfileWriter {
     buffer_ += ",\n\"benchmarks\":[";
   }
 
-  void newValue(std::string_view name, double milliseconds) override {
+  void newValue(std::string_view name, double milliseconds, std::optional<double> beginTime) override {
     buffer_ += isFirst_ ? "\n" : ",\n";
     isFirst_ = false;
     buffer_ += "{\"name\":";
@@ -50,7 +50,12 @@ class JsonBenchfileWriter final : public BenchfileWriter {
     const std::string text = buffer_.substr(number);
     buffer_ += ",\"cpu_time\":";
     buffer_ += text;
-    buffer_ += ",\"time_unit\":\"ms\"}";
+    buffer_ += ",\"time_unit\":\"ms\"";
+    if (beginTime) {
+      buffer_ += ",\"begin\":";
+      appendCompactJson(buffer_, Value(*beginTime));
+    }
+    buffer_ += '}';
     if (buffer_.size() > kBufferBytes) flush();
   }
 
@@ -86,8 +91,8 @@ std::string hostName() {
 
 }  // namespace
 
-std::unique_ptr<BenchfileWriter> JsonBenchfile::open(const std::string& path, std::string_view dataName,
-                                                     int resultsVersion, int& systemError) {
+std::unique_ptr<BenchfileWriter> JsonBenchfile::open(const std::string& path, const BenchfileFacts& facts,
+                                                     int& systemError) {
   systemError = 0;
   const std::string newPath = path + kNewSuffix;
   static_cast<void>(::unlink(path.c_str()));
@@ -106,8 +111,9 @@ std::unique_ptr<BenchfileWriter> JsonBenchfile::open(const std::string& path, st
   writer->begin(ValueMap{{"date", Date{clock_.now()}},
                          {"host_name", hostName()},
                          {"num_cpus", static_cast<std::int64_t>(std::thread::hardware_concurrency())},
-                         {"data_name", dataName},
-                         {"results_version", resultsVersion}});
+                         {"data_name", facts.dataName},
+                         {"results_version", facts.resultsVersion},
+                         {"reporter_id", facts.reporterID}});
   return writer;
 }
 

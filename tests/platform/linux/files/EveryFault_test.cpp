@@ -157,9 +157,9 @@ TEST_P(EveryFaultTest, ABenchmarkFileIsWholeUnderItsNameOrNotThere) {
     const ManualClock clock;
     JsonBenchfile benchfile(clock);
     int error = 0;
-    const auto writer = benchfile.open(directory + "/a.json", "test", 1, error);
+    const auto writer = benchfile.open(directory + "/a.json", {"test", 1, 77}, error);
     if (writer == nullptr) return false;
-    for (int value = 0; value < 2'000; ++value) writer->newValue("value", value);
+    for (int value = 0; value < 2'000; ++value) writer->newValue("value", value, {});
     return !writer->close();
   };
   failEachCall(nullptr, write, [](const std::string& directory, bool isAcknowledged) {

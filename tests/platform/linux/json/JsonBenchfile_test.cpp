@@ -20,7 +20,7 @@ using Json = nlohmann::json;
 class JsonBenchfileTest : public testing::Test {
  protected:
   std::unique_ptr<BenchfileWriter> open(const std::string& name = "data.bdj") {
-    return benchfile_.open(directory_.path(name), "TWReporting", 4, systemError_);
+    return benchfile_.open(directory_.path(name), {"TWReporting", 4, 77}, systemError_);
   }
   Json written(const std::string& name = "data.bdj") const {
     std::ifstream file(directory_.path(name));
@@ -41,6 +41,7 @@ TEST_F(JsonBenchfileTest, TheContextHoldsTheDatasNameAndVersion) {
   const Json context = written().at("context");
   EXPECT_EQ(context.at("data_name"), "TWReporting");
   EXPECT_EQ(context.at("results_version"), 4);
+  EXPECT_EQ(context.at("reporter_id"), 77);
   EXPECT_EQ(context.at("date"), "2025-11-20T10:18:00Z");
   EXPECT_TRUE(context.at("host_name").is_string());
   EXPECT_GE(context.at("num_cpus").get<int>(), 1);
@@ -48,9 +49,9 @@ TEST_F(JsonBenchfileTest, TheContextHoldsTheDatasNameAndVersion) {
 
 TEST_F(JsonBenchfileTest, EachValueIsABenchmarkThatComparisonToolsRead) {
   const auto writer = open();
-  writer->newValue("decode", 1.5);
-  writer->newValue("mix \"loud\"\n", 2.0);
-  writer->newValue("decode", 0.25);
+  writer->newValue("decode", 1.5, {});
+  writer->newValue("mix \"loud\"\n", 2.0, {});
+  writer->newValue("decode", 0.25, {});
   EXPECT_FALSE(writer->close());
   const Json benchmarks = written().at("benchmarks");
   ASSERT_EQ(benchmarks.size(), 3U);
@@ -65,6 +66,16 @@ TEST_F(JsonBenchfileTest, EachValueIsABenchmarkThatComparisonToolsRead) {
   EXPECT_EQ(benchmarks[2].at("real_time"), 0.25);
 }
 
+TEST_F(JsonBenchfileTest, AValueHasItsBeginWhereThatIsKnown) {
+  const auto writer = open();
+  writer->newValue("decode", 1.5, 1'763'633'880.250123);
+  writer->newValue("decode", 2.5, {});
+  EXPECT_FALSE(writer->close());
+  const Json benchmarks = written().at("benchmarks");
+  EXPECT_EQ(benchmarks[0].at("begin"), 1'763'633'880.250123);
+  EXPECT_FALSE(benchmarks[1].contains("begin"));
+}
+
 TEST_F(JsonBenchfileTest, WithoutValuesItIsStillAFile) {
   EXPECT_FALSE(open()->close());
   EXPECT_EQ(written().at("benchmarks"), Json::array());
@@ -72,7 +83,7 @@ TEST_F(JsonBenchfileTest, WithoutValuesItIsStillAFile) {
 
 TEST_F(JsonBenchfileTest, WritesMoreThanItHoldsInMemory) {
   const auto writer = open();
-  for (int i = 0; i < 10'000; ++i) writer->newValue("decode", i);
+  for (int i = 0; i < 10'000; ++i) writer->newValue("decode", i, {});
   EXPECT_FALSE(writer->close());
   const Json benchmarks = written().at("benchmarks");
   ASSERT_EQ(benchmarks.size(), 10'000U);
@@ -104,7 +115,7 @@ TEST_F(JsonBenchfileTest, SaysWhyItCannotBeOpened) {
 }
 
 TEST_F(JsonBenchfileTest, AnAbandonedWriterLeavesNoFile) {
-  open()->newValue("decode", 1.5);
+  open()->newValue("decode", 1.5, {});
   EXPECT_FALSE(std::filesystem::exists(directory_.path("data.bdj")));
 }
 
@@ -116,7 +127,7 @@ TEST_F(JsonBenchfileTest, AFullDiskShowsAtTheEndAndLeavesNoFile) {
   const rlimit small{.rlim_cur = 100'000, .rlim_max = before.rlim_max};
   auto writer = open();
   ASSERT_EQ(setrlimit(RLIMIT_FSIZE, &small), 0);
-  for (int i = 0; i < 10'000; ++i) writer->newValue("decode", i);
+  for (int i = 0; i < 10'000; ++i) writer->newValue("decode", i, {});
   const std::error_code error = writer->close();
   setrlimit(RLIMIT_FSIZE, &before);
   std::signal(SIGXFSZ, ignored);

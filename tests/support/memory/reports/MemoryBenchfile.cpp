@@ -13,8 +13,10 @@ class MemoryWriter final : public BenchfileWriter {
   MemoryWriter(MemoryFileSystem& files, std::string path, std::string text, std::errc failure)
       : files_(files), path_(std::move(path)), text_(std::move(text)), failure_(failure) {}
 
-  void newValue(std::string_view name, double milliseconds) override {
-    text_ += std::string(name) + " " + Value(milliseconds).text() + "\n";
+  void newValue(std::string_view name, double milliseconds, std::optional<double> beginTime) override {
+    text_ += std::string(name) + " " + Value(milliseconds).text();
+    if (beginTime) text_ += " at " + Value(*beginTime).text();
+    text_ += "\n";
   }
   [[nodiscard]] std::error_code close() override {
     if (failure_ != std::errc()) return std::make_error_code(failure_);
@@ -31,12 +33,14 @@ class MemoryWriter final : public BenchfileWriter {
 
 }  // namespace
 
-std::unique_ptr<BenchfileWriter> MemoryBenchfile::open(const std::string& path, std::string_view dataName,
-                                                       int resultsVersion, int& systemError) {
+std::unique_ptr<BenchfileWriter> MemoryBenchfile::open(const std::string& path, const BenchfileFacts& facts,
+                                                       int& systemError) {
   systemError = openFailure;
+  reporterID = facts.reporterID;
   if (openFailure != 0) return nullptr;
   return std::make_unique<MemoryWriter>(
-      files_, path, std::string(dataName) + " " + std::to_string(resultsVersion) + "\n", closeFailure);
+      files_, path, std::string(facts.dataName) + " " + std::to_string(facts.resultsVersion) + "\n",
+      closeFailure);
 }
 
 }  // namespace tonewerk

@@ -8,8 +8,8 @@ namespace {
 
 class MemoryModel final : public KolviModel, private KolviTimeModel {
  public:
-  explicit MemoryModel(std::map<std::string, std::vector<std::uint64_t>> intervals)
-      : intervals_(std::move(intervals)) {}
+  MemoryModel(std::map<std::string, std::vector<std::uint64_t>> intervals, std::optional<double> beginTime)
+      : intervals_(std::move(intervals)), beginTime_(beginTime) {}
 
   const KolviTimeModel& timeModel() const override { return *this; }
   double secondsFromSystemTimeDuration(std::uint64_t duration) const override {
@@ -20,13 +20,14 @@ class MemoryModel final : public KolviModel, private KolviTimeModel {
       std::vector<KolviEvent> events;
       const auto found = intervals_.find(signpost);
       if (found == intervals_.end()) return events;
-      for (const std::uint64_t duration : found->second) events.push_back({duration});
+      for (const std::uint64_t duration : found->second) events.push_back({duration, beginTime_});
       return events;
     });
   }
 
  private:
   const std::map<std::string, std::vector<std::uint64_t>> intervals_;
+  const std::optional<double> beginTime_;
 };
 
 }  // namespace
@@ -37,7 +38,7 @@ std::unique_ptr<KolviModel> MemoryKolvi::openModel(const std::string& traceLocat
     problem = *failure;
     return nullptr;
   }
-  return std::make_unique<MemoryModel>(intervals);
+  return std::make_unique<MemoryModel>(intervals, beginTime);
 }
 
 }  // namespace tonewerk

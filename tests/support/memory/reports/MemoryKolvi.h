@@ -24,6 +24,7 @@ class MemoryKolvi final : public Kolvi {
                                                       std::string& problem) override;
 
   std::map<std::string, std::vector<std::uint64_t>> intervals;  // by signpost
+  std::optional<double> beginTime;                              // of each interval; seconds since 1970
   std::optional<std::string> failure;                           // opening fails with it
   std::vector<std::string> opened;                              // the locations that were opened
 };

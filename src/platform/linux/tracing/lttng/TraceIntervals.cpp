@@ -33,6 +33,12 @@ bool takeNumber(std::string_view& text, Number& number) {
   return true;
 }
 
+bool takeSpace(std::string_view& text) {
+  if (!text.starts_with(' ')) return false;
+  text.remove_prefix(1);
+  return true;
+}
+
 class Parser {
  public:
   // Parses a line with a name or an interval. False for any other line.
@@ -42,11 +48,15 @@ class Parser {
       return true;
     }
     std::size_t index = 0;
-    std::uint64_t nanoseconds = 0;
-    if (!takeNumber(line, index) || index >= byIndex_.size() || !line.starts_with(' ')) return false;
-    line.remove_prefix(1);
-    if (!takeNumber(line, nanoseconds) || !line.empty()) return false;
-    byIndex_[index]->push_back(nanoseconds);
+    TraceInterval interval;
+    std::int64_t sincePrevious = 0;
+    const bool isInterval = takeNumber(line, index) && index < byIndex_.size() && takeSpace(line) &&
+                            takeNumber(line, interval.duration) && takeSpace(line) &&
+                            takeNumber(line, sincePrevious) && line.empty() &&
+                            !__builtin_add_overflow(previousEnd_, sincePrevious, &interval.end);
+    if (!isInterval) return false;
+    previousEnd_ = interval.end;
+    byIndex_[index]->push_back(interval);
     return true;
   }
 
@@ -54,8 +64,9 @@ class Parser {
 
  private:
   TraceIntervals intervals_;
-  std::vector<std::vector<std::uint64_t>*>
-      byIndex_;  // point into intervals_; a map does not move its entries
+  // Point into intervals_; a map does not move its entries.
+  std::vector<std::vector<TraceInterval>*> byIndex_;
+  std::int64_t previousEnd_ = 0;
 };
 
 }  // namespace

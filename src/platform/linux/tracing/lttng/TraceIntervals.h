@@ -11,9 +11,16 @@
 
 namespace tonewerk {
 
-// The durations of a trace's intervals in nanoseconds, by signpost, in the order in which the intervals
-// ended.
-using TraceIntervals = std::map<std::string, std::vector<std::uint64_t>, std::less<>>;
+// Times are in nanoseconds.
+struct TraceInterval {
+  std::uint64_t duration = 0;
+  std::int64_t end = 0;  // since 1970
+
+  friend bool operator==(const TraceInterval&, const TraceInterval&) = default;
+};
+
+// A trace's intervals by signpost, in the order in which they ended.
+using TraceIntervals = std::map<std::string, std::vector<TraceInterval>, std::less<>>;
 
 // Parses the output of tw-trace-reader. None if it has another form or is incomplete; `problem` then says
 // why. If the reader reported a problem itself, `problem` is its text.

@@ -28,7 +28,10 @@ class IntervalModel final : public KolviModel, private KolviTimeModel {
       const auto found = intervals_.find(signpost);
       if (found == intervals_.end()) return events;
       events.reserve(found->second.size());
-      for (const std::uint64_t nanoseconds : found->second) events.push_back({nanoseconds});
+      for (const TraceInterval& interval : found->second) {
+        const double begin = static_cast<double>(interval.end) - static_cast<double>(interval.duration);
+        events.push_back({.timeDuration = interval.duration, .beginTime = begin * kSecondsPerNanosecond});
+      }
       return events;
     });
   }

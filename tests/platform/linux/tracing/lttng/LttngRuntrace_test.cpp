@@ -30,6 +30,10 @@ std::uint64_t nanosecondsNow() {
   return static_cast<std::uint64_t>(std::chrono::steady_clock::now().time_since_epoch().count());
 }
 
+double secondsNow() {
+  return std::chrono::duration<double>(std::chrono::system_clock::now().time_since_epoch()).count();
+}
+
 class LttngRuntraceTest : public testing::Test {
  protected:
   // Starts a trace. The test fails if that fails.
@@ -73,6 +77,28 @@ class LttngRuntraceTest : public testing::Test {
   std::shared_ptr<TraceListener> listener_ = std::make_shared<TraceListener>();
   std::string problem_;
 };
+
+TEST_F(LttngRuntraceTest, RecordsWhenIntervalsBegan) {
+  const auto session = startWell();
+  const double before = secondsNow();
+  for (std::uint64_t i = 0; i < 10; ++i) {
+    signpost::begin("decode", i);
+    signpost::end("decode", i);
+  }
+  const double after = secondsNow();
+  const auto probes = finish(*session);
+  ASSERT_THAT(probes, SizeIs(2));
+  ASSERT_THAT(probes[0].events, SizeIs(10));
+  // The tracer compares its clock with the time of day only once, and does not read both at the same instant.
+  constexpr double kClockError = 0.1;
+  double last = before - kClockError;
+  for (const KolviEvent& event : probes[0].events) {
+    ASSERT_TRUE(event.beginTime);
+    EXPECT_GE(*event.beginTime, last);
+    last = *event.beginTime;
+  }
+  EXPECT_LE(last, after + kClockError);
+}
 
 TEST_F(LttngRuntraceTest, RecordsHowLongIntervalsTook) {
   const auto session = startWell();
@@ -415,8 +441,8 @@ TEST_F(TraceReaderKolviTest, InvalidOutputOfTheReaderIsAnError) {
 }
 
 TEST_F(TraceReaderKolviTest, ATraceMustHoldItsBeginningAndItsEnd) {
-  const std::string check = "echo 'name com.orvane.tonewerk.check'; echo '0 1'; ";
-  EXPECT_EQ(problemWith("echo 'name decode'; echo '0 1'; echo '0 1'; echo end"),
+  const std::string check = "echo 'name com.orvane.tonewerk.check'; echo '0 1 2'; ";
+  EXPECT_EQ(problemWith("echo 'name decode'; echo '0 1 2'; echo '0 1 2'; echo end"),
             "the trace lacks its beginning or its end");
   EXPECT_EQ(problemWith(check + "echo end"), "the trace lacks its beginning or its end");
 }
