@@ -61,13 +61,15 @@ bool writeFile(TracingRig& rig, const TraceListener& listener, std::uint64_t& co
   const SystemClock clock;
   JsonBenchfile benchfile(clock);
   int systemError = 0;
-  const auto writer = benchfile.open(rig.directory.path("data.bdj"), "TWReporting", 4, systemError);
+  const auto writer =
+      benchfile.open(rig.directory.path("data.bdj"),
+                     {.dataName = "TWReporting", .resultsVersion = 4, .reporterID = 1}, systemError);
   if (writer == nullptr) return false;
   for (const KolviProbe& probe : model->makeProbes(*probeDictionariesOf(*rig.json.parse(kProbes, problem)))) {
     count += probe.events.size();
     for (const KolviEvent& event : probe.events) {
-      writer->newValue(probe.name,
-                       model->timeModel().secondsFromSystemTimeDuration(event.timeDuration) * 1e3);
+      writer->newValue(probe.name, model->timeModel().secondsFromSystemTimeDuration(event.timeDuration) * 1e3,
+                       event.beginTime);
     }
   }
   return !writer->close();

@@ -17,6 +17,7 @@ namespace {
 constexpr double kMicrosecondsPerSecond = 1e6;
 constexpr std::int64_t kProcess = 1;
 constexpr std::int64_t kGraph = 2;
+constexpr std::int64_t kSignposts = 3;
 constexpr std::int64_t kCycles = 1;  // the first thread of the graph
 
 enum Thread : std::int64_t {
@@ -52,8 +53,9 @@ class TraceWriter {
  public:
   using Cycles = std::map<std::int64_t, std::vector<GlitchCycle>>;
 
-  TraceWriter(const StoredSession& session, const SessionRecords& records, const Cycles& cycles)
-      : session_(session), records_(records), cycles_(cycles) {
+  TraceWriter(const StoredSession& session, const SessionRecords& records, const Cycles& cycles,
+              const std::vector<SignpostInterval>& signposts)
+      : session_(session), records_(records), cycles_(cycles), signposts_(signposts) {
     begin_ = session.startedAt;
     end_ = session.endedAt.value_or(begin_);
     for (const SessionRecords::Stretch& stretch : records.stretches) {
@@ -80,6 +82,7 @@ class TraceWriter {
     addVolume();
     for (const SessionRecords::Issue& issue : records_.issues) addIssue(issue);
     addGlitches();
+    for (const SignpostInterval& signpost : signposts_) addSignpost(signpost);
     return written();
   }
 
@@ -246,6 +249,17 @@ class TraceWriter {
     }
   }
 
+  // A pair of events with a number of its own.
+  void addSignpost(const SignpostInterval& signpost) {
+    ++signpostNumber_;
+    constexpr double kMsPerSecond = 1000.0;
+    const std::int64_t begin = timeOf(signpost.begin);
+    const std::int64_t end = timeOf(signpost.begin + signpost.milliseconds / kMsPerSecond);
+    const ValueMap common{{"name", signpost.name}, {"cat", "signpost"}, {"id", signpostNumber_}};
+    add(common, "b", begin, kSignposts, {{"ms", signpost.milliseconds}}, kSignposts);
+    add(common, "e", end, kSignposts, {}, kSignposts);
+  }
+
   std::int64_t nodeThread(const GlitchCycle::Node& node) {
     const std::string name = node.process.empty() ? node.name : node.name + " (" + node.process + ")";
     const auto next = kCycles + 1 + static_cast<std::int64_t>(nodeThreads_.size());
@@ -287,6 +301,10 @@ class TraceWriter {
       appendName(text, "thread_name", kCycles, "cycles", kGraph);
     }
     for (const auto& [name, thread] : nodeThreads_) appendName(text, "thread_name", thread, name, kGraph);
+    if (!signposts_.empty()) {
+      appendName(text, "process_name", 0, "signposts", kSignposts);
+      appendName(text, "thread_name", kSignposts, "signposts", kSignposts);
+    }
     for (std::size_t at = 0; at < events_.size(); ++at) {
       appendCompactJson(text, events_[at].json);
       text += at + 1 < events_.size() ? ",\n" : "\n";
@@ -297,6 +315,8 @@ class TraceWriter {
   const StoredSession& session_;
   const SessionRecords& records_;
   const Cycles& cycles_;
+  const std::vector<SignpostInterval>& signposts_;
+  std::int64_t signpostNumber_ = 0;
   std::map<std::string, std::int64_t> nodeThreads_;
   std::map<std::int64_t, std::int64_t> busyUntil_;  // by thread of the graph, in microseconds
   double begin_ = 0.0;
@@ -307,8 +327,9 @@ class TraceWriter {
 }  // namespace
 
 std::string chromeTrace(const StoredSession& session, const SessionRecords& records,
-                        const std::map<std::int64_t, std::vector<GlitchCycle>>& cycles) {
-  return TraceWriter(session, records, cycles).text();
+                        const std::map<std::int64_t, std::vector<GlitchCycle>>& cycles,
+                        const std::vector<SignpostInterval>& signposts) {
+  return TraceWriter(session, records, cycles, signposts).text();
 }
 
 }  // namespace tonewerk

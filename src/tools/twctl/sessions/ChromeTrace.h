@@ -8,6 +8,7 @@
 
 #include "tools/twctl/sessions/GlitchCycles.h"
 #include "tools/twctl/sessions/SessionRecords.h"
+#include "tools/twctl/sessions/SignpostFile.h"
 #include "tools/twctl/sessions/StoredSessions.h"
 
 namespace tonewerk {
@@ -26,10 +27,14 @@ namespace tonewerk {
 //   threads   cycles: a slice for each, which ends at the deadline
 //             one for each node: slices for as long as it waited and ran
 //
+//   process   signposts, where there are any: an asynchronous slice (b, e) for each interval, because they
+//             overlap
+//
 // A cycle that is near two glitches is there once. A session that has not ended goes on until
 // the last time that the store has of it.
 // `cycles`: those around glitches, by their events.
 [[nodiscard]] std::string chromeTrace(const StoredSession& session, const SessionRecords& records,
-                                      const std::map<std::int64_t, std::vector<GlitchCycle>>& cycles = {});
+                                      const std::map<std::int64_t, std::vector<GlitchCycle>>& cycles = {},
+                                      const std::vector<SignpostInterval>& signposts = {});
 
 }  // namespace tonewerk

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <filesystem>
 #include <gmock/gmock.h>
+#include <stdlib.h>
 #include <string>
 #include <sys/stat.h>
 
@@ -14,6 +15,7 @@ namespace {
 using testing::AllOf;
 using testing::HasSubstr;
 using testing::IsEmpty;
+using testing::Not;
 using testing::StartsWith;
 
 // Runs twctl with a store and without a journal.
@@ -117,7 +119,28 @@ TEST_F(SessionCommandTest, ExplainsOneThingAtATime) {
   EXPECT_THAT(errors(), HasSubstr("did you mean 'volume'?"));
 }
 
-class TraceCommandTest : public SessionCommandTest {};
+class TraceCommandTest : public SessionCommandTest {
+ protected:
+  TraceCommandTest() {
+    setenv("LOGS_DIRECTORY", directory_.path("logs").c_str(), 1);
+    std::filesystem::create_directories(directory_.path("logs/Audio/Traces"));
+  }
+  void TearDown() override {
+    unsetenv("LOGS_DIRECTORY");
+    SessionCommandTest::TearDown();
+  }
+
+  // Writes the benchmark data file of a session's trace.
+  std::string traced(const std::string& name, const std::string& reporter, const std::string& entries) {
+    return write(name,
+                 "{\"context\":{\"reporter_id\":" + reporter + "},\n\"benchmarks\":[\n" + entries + "\n]}\n");
+  }
+  std::string textOf(const std::string& file) const {
+    std::string text;
+    EXPECT_FALSE(readTextFile(file, text));
+    return text;
+  }
+};
 
 TEST_F(TraceCommandTest, MakesAFileThatOnlyItsOwnerMayRead) {
   const std::string file = directory_.path("trace.json");
@@ -136,6 +159,44 @@ TEST_F(TraceCommandTest, MakesNoFileForASessionThatIsNotThere) {
   EXPECT_EQ(run({"trace", "--session", "12", "-o", file}), kRefused);
   EXPECT_THAT(errors(), HasSubstr("the store has no session 12"));
   EXPECT_FALSE(std::filesystem::exists(file));
+}
+
+TEST_F(TraceCommandTest, HasTheSignpostsOfTheSession) {
+  (void)traced("logs/Audio/Traces/1.bdj", "1002", R"({"name":"decode","real_time":1.5,"begin":1795132801})");
+  (void)traced("logs/Audio/Traces/2.bdj", "1002", R"({"name":"mix","real_time":1.5,"begin":1795132802})");
+  (void)traced("logs/Audio/Traces/3.bdj", "1003", R"({"name":"other's","real_time":1.5,"begin":1795132801})");
+  (void)traced("logs/Audio/Traces/4.txt", "1002", R"({"name":"text","real_time":1.5,"begin":1795132801})");
+  std::filesystem::create_directory(directory_.path("logs/Audio/Traces/5.bdj"));
+  const std::string file = directory_.path("trace.json");
+  EXPECT_EQ(run({"trace", "--session", "2", "-o", file}), kDone) << errors();
+  EXPECT_THAT(errors(), IsEmpty());
+  EXPECT_THAT(textOf(file),
+              AllOf(HasSubstr(R"("name":"decode","cat":"signpost")"), HasSubstr(R"("name":"mix")")));
+  EXPECT_THAT(textOf(file), AllOf(Not(HasSubstr("other's")), Not(HasSubstr("\"text\""))));
+}
+
+TEST_F(TraceCommandTest, TakesSignpostsFromAFileElsewhereWhosesoeverItIs) {
+  const std::string signposts =
+      traced("my.bdj", "9", R"({"name":"decode","real_time":1.5,"begin":1795132801})");
+  const std::string file = directory_.path("trace.json");
+  EXPECT_EQ(run({"trace", "--session", "2", "--signposts", signposts, "-o", file}), kDone) << errors();
+  EXPECT_THAT(textOf(file), HasSubstr(R"("name":"decode","cat":"signpost")"));
+}
+
+TEST_F(TraceCommandTest, SaysWhyAFileGivesNoSignposts) {
+  const std::string file = directory_.path("trace.json");
+  const auto problemWith = [&](const std::string& signposts) {
+    EXPECT_EQ(run({"trace", "--session", "2", "--signposts", signposts, "-o", file}), kRefused);
+    EXPECT_FALSE(std::filesystem::exists(file));
+    return errors();
+  };
+  EXPECT_THAT(problemWith(directory_.path("none.bdj")), HasSubstr("none.bdj: it is no file\n"));
+  EXPECT_THAT(problemWith("/dev/zero"), HasSubstr("it is no file\n"));
+  EXPECT_THAT(problemWith(write("a.bdj", "noise")), HasSubstr("it is no benchmark data file"));
+  EXPECT_THAT(problemWith(traced("b.bdj", "1002", R"({"name":"decode","real_time":1.5})")),
+              HasSubstr("it does not say when its intervals began"));
+  EXPECT_THAT(problemWith(traced("c.bdj", "1002", R"({"name":"decode","real_time":1.5,"begin":1})")),
+              HasSubstr("none of its intervals began while the session was there"));
 }
 
 TEST_F(TraceCommandTest, LeavesAFileThatExistsAsItIs) {

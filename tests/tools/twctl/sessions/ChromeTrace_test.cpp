@@ -3,6 +3,7 @@
 
 #include <gmock/gmock.h>
 #include <map>
+#include <set>
 #include <string>
 #include <utility>
 #include <vector>
@@ -51,7 +52,7 @@ class ChromeTraceTest : public testing::Test {
   ValueMap trace() const {
     const NlohmannJsonService json;
     std::string problem;
-    const auto value = json.parse(chromeTrace(session_, records_, cycles_), problem);
+    const auto value = json.parse(chromeTrace(session_, records_, cycles_, signposts_), problem);
     EXPECT_TRUE(value) << problem;
     return value && value->asMap() != nullptr ? *value->asMap() : ValueMap();
   }
@@ -79,22 +80,25 @@ class ChromeTraceTest : public testing::Test {
                          .ending = "stopped"};
   SessionRecords records_;
   std::map<std::int64_t, std::vector<GlitchCycle>> cycles_;
+  std::vector<SignpostInterval> signposts_;
 };
 
 // The rules of the format: which fields each phase needs, and what viewers expect of them.
 TEST_F(ChromeTraceTest, KeepsTheRulesOfTheFormat) {
   glitched(6, 2.0);
   glitched(7, 2.005);
+  signposts_ = {{"decode", kBegin + 2.0, 1.5}, {"decode", kBegin + 2.001, 1.5}};
   const ValueMap all = trace();
   double last = 0.0;
   std::map<std::pair<std::int64_t, std::int64_t>, double> busyUntil;  // by process and thread
   std::map<std::pair<std::int64_t, std::int64_t>, std::string> threads;
+  std::set<std::int64_t> open;  // asynchronous slices
   for (const Value& value : *all.find("traceEvents")->asArray()) {
     ASSERT_NE(value.asMap(), nullptr);
     const ValueMap& event = *value.asMap();
     const std::string phase = event.text("ph");
     for (const char* field : {"name", "ph", "ts", "pid", "tid"}) EXPECT_TRUE(event.contains(field)) << field;
-    EXPECT_THAT(phase, testing::AnyOf("M", "X", "C", "i"));
+    EXPECT_THAT(phase, testing::AnyOf("M", "X", "C", "i", "b", "e"));
     const double at = event.number("ts");
     EXPECT_GE(at, last) << "not sorted";
     last = at;
@@ -112,9 +116,12 @@ TEST_F(ChromeTraceTest, KeepsTheRulesOfTheFormat) {
       EXPECT_GE(at, busyUntil[thread]) << "slices of one thread overlap";
       busyUntil[thread] = at + event.number("dur");
     }
+    if (phase == "b") EXPECT_TRUE(open.insert(event.integer("id")).second) << "a number twice";
+    if (phase == "e") EXPECT_EQ(open.erase(event.integer("id")), 1U) << "an end without a begin";
     if (phase == "i") EXPECT_EQ(event.text("s"), "t");
     if (phase == "C") EXPECT_NE(event.find("args")->asMap()->find("volume")->asDouble(), nullptr);
   }
+  EXPECT_THAT(open, testing::IsEmpty());
   EXPECT_EQ(threads.at({1, 0}), "session 41: org.example.\"Player\"\n");
 }
 
@@ -154,6 +161,16 @@ TEST_F(ChromeTraceTest, HasACycleNearTwoGlitchesOnce) {
   EXPECT_THAT(cycles,
               ElementsAre("the glitch's cycle 2000000+5000", "cycle 2005000+5000", "cycle 2010001+5000"));
   EXPECT_THAT(events("i"), testing::Contains("glitch: late 2005001"));
+}
+
+TEST_F(ChromeTraceTest, HasTheIntervalsOfSignpostsWhichMayOverlap) {
+  signposts_ = {
+      {"mix", kBegin + 2.001, 0.25}, {"decode", kBegin + 2.0, 1.5}, {"decode", kBegin + 2.001, 1.5}};
+  EXPECT_THAT(events("b"), ElementsAre("decode 2000000", "mix 2001000", "decode 2001000"));
+  EXPECT_THAT(events("e"), ElementsAre("mix 2001250", "decode 2001500", "decode 2002500"));
+  EXPECT_THAT(chromeTrace(session_, records_, cycles_, signposts_),
+              HasSubstr(R"("name":"process_name","ph":"M","pid":3)"));
+  EXPECT_THAT(chromeTrace(session_, records_, cycles_), Not(HasSubstr("signposts")));
 }
 
 TEST_F(ChromeTraceTest, MarksIssues) { EXPECT_THAT(events("i"), ElementsAre("overload 2500000")); }
