@@ -37,6 +37,16 @@ CLASHES = """[...document.querySelectorAll('.picture svg')].flatMap((svg) => {
   return found;
 })"""
 
+# The words of at most ten letters in the table of glitches that go on in the next line.
+BROKEN_WORDS = """[...document.querySelectorAll('#glitches th, #glitches td')].flatMap((cell) => {
+  const range = document.createRange();
+  return [...cell.textContent.matchAll(/[a-z]{2,10}/gi)].flatMap((word) => {
+    range.setStart(cell.firstChild, word.index);
+    range.setEnd(cell.firstChild, word.index + word[0].length);
+    return range.getClientRects().length > 1 && word[0].length === cell.textContent.match(/\\S+/g).find((whole) => whole.includes(word[0])).length ? [word[0]] : [];
+  });
+})"""
+
 NOTHING = "".join(f"DELETE FROM {table};" for table in ("session", "event", "volume_stretch", "input_stretch", "gather_stretch", "issue", "glitch", "haptics", "channel_value", "channel_bucket", "channel_state"))
 
 
@@ -480,6 +490,16 @@ class PageTest(unittest.TestCase):
         self.browser.call("Emulation.setEmulatedMedia", media="print", features=[{"name": "prefers-color-scheme", "value": "dark"}])
         self.assertEqual(self.browser.evaluate("getComputedStyle(document.body).backgroundColor"), "rgb(255, 255, 255)")
         self.assertEqual(self.browser.evaluate("[...document.querySelectorAll('button, details')].filter((element) => element.checkVisibility()).length"), 0)
+
+    def test_tables_fit_on_paper_and_break_no_short_words(self):
+        page = self.show("--days", "30", width=688)  # A4 without its margins
+        self.assertGreater(page.query("SELECT count(*) FROM glitch WHERE cause = 'not scheduled'")[0][0], 0)
+        self.browser.call("Emulation.setEmulatedMedia", media="print")
+        wide = "[...document.querySelectorAll('table')].filter((table) => table.checkVisibility() && table.getBoundingClientRect().right > 689).length"
+        self.assertEqual(self.browser.evaluate(wide), 0)
+        self.assertEqual(self.browser.evaluate(BROKEN_WORDS), [])
+        self.browser.call("Emulation.setEmulatedMedia", media="screen")
+        self.assertEqual(self.browser.evaluate(BROKEN_WORDS), [])
 
     def test_shows_one_session(self):
         source = Page(self.scratch, "all", "--days", "5")
