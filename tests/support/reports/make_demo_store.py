@@ -105,7 +105,11 @@ class Device:
             "stuck": ("stuck", "stuck", ("Soft Synth", "synth", 3001, "synth")),
         }.get(kind, (None, None, (None, None, None, None)))
         chain = f"{culprit[3]} > {node} > {device}" if own == "waiting for another" else None
-        reason = None if own is None else f"{culprit[3]} took {period + over:.1f} ms of {period:.1f} ms."
+        reason = {
+            "hog": f"{node} was ready and did not run for {over:.1f} ms: backup had its processor.",
+            "device": f"{device} asked for the next cycle {over:.1f} ms late.",
+            "stuck": "synth did not answer for 4 cycles.",
+        }.get(kind, None if own is None else f"{culprit[3]} took {period + over:.1f} ms of {period:.1f} ms.")
         begin = [0.0] if culprit[3] is None else [-period * 1000, 0.0, period * 1000]
         cycles = [{"begin": round(time, 1), "period": round(period * 1000, 1), "nodes": [
             {"name": one, "process": one, "signal": 10.0, "awake": 15.0 + 50 * i, "finish": round(40.0 + 200 * i + (1000 * (period + over) if time == 0 else 0), 1)}
