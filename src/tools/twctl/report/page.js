@@ -127,11 +127,11 @@
 
   const MOST_TABLE_ROWS = 400;
   const MOST_LETTERS = 100; // of a name
-  // columns: [heading, cell(row), isNumber]
+  // columns: [heading, cell(row), isNumber, letters]; letters: of a cell, MOST_LETTERS when not given
   function table(columns, rows) {
     const head = el("tr", {}, ...columns.map(([heading, , isNumber]) => el("th", { scope: "col", class: isNumber ? "number" : "" }, heading)));
     const body = rows.slice(0, MOST_TABLE_ROWS).map((row) =>
-      el("tr", {}, ...columns.map(([, cell, isNumber]) => el("td", { class: isNumber ? "number" : "" }, shortened(String(cell(row) ?? ""), MOST_LETTERS)))));
+      el("tr", {}, ...columns.map(([, cell, isNumber, letters]) => el("td", { class: isNumber ? "number" : "" }, shortened(String(cell(row) ?? ""), letters ?? MOST_LETTERS)))));
     const made = el("div", { class: "scroll", tabindex: "0", role: "region", "aria-label": "Table" },
       el("table", {}, el("thead", {}, head), el("tbody", {}, ...body)));
     if (rows.length <= MOST_TABLE_ROWS) return made;
@@ -856,6 +856,7 @@
   // ---- Glitches
 
   const MOST_LISTED = 100;
+  const MOST_REASON_LETTERS = 300; // its end may say who had the processor
   function whoseGlitches() {
     const { rest, judged } = data.glitches;
     const rows = rowsOf(data.glitches.top);
@@ -877,7 +878,7 @@
       el("p", {}, `${rows.length === MOST_LISTED ? `The newest ${MOST_LISTED}.` : "The newest first."} “twctl glitches --why” and the number shows the cycles around one, and what to do.`)),
     table([["Number", (row) => String(row.id)], ["Time", (row) => at(row.at)], ["Cause", (row) => row.cause ?? (row.judged ? UNKNOWN : "not judged")], ["Who", (row) => `${named(row.culprit)}${row.process && row.process !== row.culprit ? ` (${row.process})` : ""}`],
       ["Heard by", (row) => `${named(row.heard)}${row.sessions > 1 ? `, in ${count(row.sessions)} sessions` : ""}`], ["Beyond the deadline", (row) => milliseconds(row.over), true], ["Lost", (row) => milliseconds(row.lost), true],
-      ["Times", (row) => count(row.times), true], ["Reason", (row) => row.reason ?? ""]], rows));
+      ["Times", (row) => count(row.times), true], ["Reason", (row) => row.reason ?? "", false, MOST_REASON_LETTERS]], rows));
   }
   const glitchParts = () => [whoseGlitches(), newestGlitches()].filter(Boolean);
 
