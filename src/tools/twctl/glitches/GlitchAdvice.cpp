@@ -15,6 +15,14 @@ std::string nameOf(const GlitchVerdict& verdict) {
   return verdict.culpritNode.value_or("it");
 }
 
+// The command line for what the kernel logged around a time.
+std::string kernelLogAt(double time) {
+  constexpr std::int64_t kAround = 5;  // seconds
+  const auto second = static_cast<std::int64_t>(time);
+  return "`journalctl -k --since @" + std::to_string(second - kAround) + " --until @" +
+         std::to_string(second + kAround) + "`";
+}
+
 // A period that is twice as long, in frames.
 std::string largerQuantum(const GlitchVerdict& verdict) {
   constexpr std::int64_t kUsual = 512;
@@ -91,7 +99,7 @@ std::vector<std::string> remediesFor(const GlitchVerdict& verdict) {
         "glitches --by application`."};
   }
   if (cause == "device") {
-    return {"See what the kernel says of it: `journalctl -k --since -10min`.",
+    return {"See what the kernel said then: " + kernelLogAt(verdict.at) + ".",
             "Use another port or cable, and no hub between; with a wireless device, come nearer.",
             largerQuantum(verdict)};
   }

@@ -54,6 +54,12 @@ TEST(GlitchAdviceTest, BlamesWhoHeldTheProcessorAndNotTheVictim) {
   EXPECT_THAT(remediesFor(verdictOf("not scheduled"))[0], HasSubstr("renice -n 19 -p 4711"));
 }
 
+TEST(GlitchAdviceTest, LooksIntoTheKernelsLogAtTheTimeOfTheGlitch) {
+  GlitchVerdict verdict = verdictOf("device");
+  verdict.at = 1'795'132'920.5;
+  EXPECT_THAT(remediesFor(verdict)[0], HasSubstr("journalctl -k --since @1795132915 --until @1795132925`"));
+}
+
 TEST(GlitchAdviceTest, KnowsWhatToDoWithoutNamesAndFigures) {
   for (const char* cause : {"late", "not scheduled", "stuck", "device", "unheard of"}) {
     GlitchVerdict verdict;
