@@ -32,7 +32,7 @@ struct GlitchesOptions {
   GlitchFilter filter;
   TimeRangeOptions range;
   std::string by;
-  std::string why;
+  std::optional<std::string> why;
 };
 
 constexpr std::array<std::pair<const char*, GlitchKey>, 4> kKeys{{{"application", GlitchKey::kApplication},
@@ -76,9 +76,24 @@ GlitchPicture::Look lookOf(const Tool& tool, std::optional<std::size_t> width) {
   return look;
 }
 
-int why(Tool& tool, SqlReader& reader, const std::string& id, std::optional<std::size_t> width) {
+// The number of an event of the newest glitch; none when there is no glitch, or the store cannot be read.
+std::optional<std::string> newestOf(SqlReader& reader, GlitchFilter filter, std::string& problem) {
+  std::optional<std::string> found;
+  filter.limit = 1;
+  if (readGlitches(reader, filter, problem,
+                   [&](const StoredGlitch& glitch) { found = std::to_string(glitch.verdict.event); }) &&
+      !found) {
+    problem = "no glitch was recorded, or none that was asked for";
+  }
+  return found;
+}
+
+int why(Tool& tool, SqlReader& reader, const std::string& wanted, const GlitchFilter& filter,
+        std::optional<std::size_t> width) {
   std::string problem;
-  const std::optional<GlitchInSessions> glitch = readGlitch(reader, id, problem);
+  const std::optional<std::string> id = wanted == "latest" ? newestOf(reader, filter, problem) : wanted;
+  if (!id) return tool.fail(kRefused, problem);
+  const std::optional<GlitchInSessions> glitch = readGlitch(reader, *id, problem);
   if (!glitch) return tool.fail(kRefused, problem);
   const GlitchStory story(*glitch, GlitchCycles::read(glitch->cycles, tool.json));
   if (!tool.asJson) {
@@ -132,7 +147,7 @@ int glitches(Tool& tool, const GlitchesOptions& options) {
   filter.until = range->until;
   const auto terminal = tool.outIsTerminal ? terminalSizeOf(tool.outDescriptor) : std::nullopt;
   const auto width = terminal ? std::optional(terminal->columns) : std::nullopt;
-  if (!options.why.empty()) return why(tool, reader, options.why, width);
+  if (options.why) return why(tool, reader, *options.why, filter, width);
   if (!options.by.empty()) return sums(tool, reader, filter, options.by, width);
   return list(tool, reader, filter, width);
 }
@@ -155,8 +170,10 @@ void addGlitchesCommand(CLI::App& app, Tool& tool) {
           ->type_name("KEY")
           ->check(problemWithKey);
   command
-      .add_option("--why", options->why,
-                  "The cycles around one as a picture, and what to do: its id, or latest")
+      .add_option(
+          "--why", options->why,
+          "The cycles around one as a picture, and what to do: its id, or latest of those that the other "
+          "options choose")
       ->type_name("ID")
       ->excludes(by);
   options->range.addTo(command, "glitches");
@@ -173,7 +190,7 @@ void addGlitchesCommand(CLI::App& app, Tool& tool) {
                   "Only those in this session, the first column of `twctl "
                   "sessions`")
       ->type_name("ID")
-      ->check(CLI::PositiveNumber);
+      ->check(problemWithCount);
   command.callback([&tool, options] { tool.status = glitches(tool, *options); });
 }
 

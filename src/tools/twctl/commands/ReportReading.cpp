@@ -10,6 +10,7 @@
 
 #include "tools/twctl/Tool.h"
 #include "tools/twctl/commands/RecordedDevice.h"
+#include "tools/twctl/input/ValueArguments.h"
 #include "tools/twctl/report/DaemonHealth.h"
 #include "values/Value.h"
 
@@ -48,7 +49,7 @@ void ReportScopeOptions::addChoice(CLI::App& command) {
       .add_option("--session", session_,
                   "Only this session: the id of the store's view session, which the page shows as #ID")
       ->type_name("ID")
-      ->check(CLI::PositiveNumber);
+      ->check(problemWithCount);
   command.add_option("--app", application_, "Only applications that this pattern fits (*, ?, [...])")
       ->type_name("GLOB");
 }

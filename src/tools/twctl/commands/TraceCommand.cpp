@@ -16,6 +16,7 @@
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/commands/OutputFile.h"
 #include "tools/twctl/commands/StoreSql.h"
+#include "tools/twctl/input/ValueArguments.h"
 #include "tools/twctl/sessions/ChromeTrace.h"
 
 namespace tonewerk {
@@ -109,7 +110,7 @@ void addTraceCommand(CLI::App& app, Tool& tool) {
   command.add_option("--session", options->session, "The session: the first column of `twctl sessions`")
       ->required()
       ->type_name("ID")
-      ->check(CLI::PositiveNumber);
+      ->check(problemWithCount);
   command
       .add_option(
           "--signposts", options->signposts,

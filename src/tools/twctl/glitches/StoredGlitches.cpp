@@ -120,11 +120,6 @@ std::optional<std::string> nameOf(SqlReader& reader, const std::string& id, std:
   std::optional<std::string> name;
   const std::string select = std::string("SELECT ") + kName + " FROM glitch ";
   const auto take = [&](const ViewRow& row) { name = row.text(0); };
-  if (id == "latest") {
-    (void)eachRow(reader, select + "ORDER BY coalesce(began_at, at) DESC, id DESC LIMIT 1", {}, problem,
-                  take);
-    return name;
-  }
   if (!eachRow(reader, select + "WHERE glitch_id = ?1 LIMIT 1", {id}, problem, take) || name) return name;
   constexpr std::size_t kMostDigits = 18;
   const bool isNumber =
@@ -189,7 +184,7 @@ std::optional<GlitchInSessions> readGlitch(SqlReader& reader, const std::string&
   const std::optional<std::string> name = nameOf(reader, id, problem);
   if (!problem.empty()) return std::nullopt;
   if (!name) {
-    problem = "the store has no glitch " + id + nearest(reader, id);
+    problem = "the store has no glitch \"" + id + "\"" + nearest(reader, id);
     return std::nullopt;
   }
   GlitchInSessions glitch;

@@ -71,7 +71,7 @@ struct GlitchInSessions {
   static constexpr int kMostSessions = 32;
 };
 
-// `id`: a glitch's own, the number of one of its events, or "latest". None when there is none such, or when
+// `id`: a glitch's own, or the number of one of its events. None when there is none such, or when
 // the store cannot be read; `problem` then says what was not found and which ones are near.
 [[nodiscard]] std::optional<GlitchInSessions> readGlitch(SqlReader& reader, const std::string& id,
                                                          std::string& problem);

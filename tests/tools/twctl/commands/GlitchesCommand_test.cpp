@@ -198,10 +198,17 @@ TEST_F(GlitchesCommandTest, TellsTheLatestAlsoWhenNobodyHasJudgedIt) {
   EXPECT_THAT(output(), HasSubstr(R"("cycles":[]})"));
 }
 
+TEST_F(GlitchesCommandTest, TellsTheLatestOfThoseThatOtherOptionsChoose) {
+  EXPECT_EQ(run({"glitches", "--why", "latest", "--device", "head*"}), kDone) << errors();
+  EXPECT_THAT(output(), HasSubstr("glitch    1795132920000-9\n"));
+  EXPECT_EQ(run({"glitches", "--why", "latest", "--app", "nobody"}), kRefused);
+  EXPECT_EQ(errors(), "twctl: no glitch was recorded, or none that was asked for\n");
+}
+
 TEST_F(GlitchesCommandTest, NamesTheNearestGlitchesOfAnUnknownOne) {
   EXPECT_EQ(run({"glitches", "--why", "1795132930000-1"}), kRefused);
   EXPECT_EQ(errors(),
-            "twctl: the store has no glitch 1795132930000-1; the nearest ones are: 1795132920000-9, "
+            "twctl: the store has no glitch \"1795132930000-1\"; the nearest ones are: 1795132920000-9, "
             "1795132860000-7, 1795136460000-3\n");
   EXPECT_EQ(run({"glitches", "--why", "that"}), kRefused);
   EXPECT_THAT(errors(), HasSubstr("the newest ones are: 14, 1795136460000-3, 1795132920000-9"));
@@ -250,7 +257,7 @@ TEST_F(GlitchesCommandTest, SaysThatThereAreNone) {
   EXPECT_EQ(run({"glitches", "--json"}), kDone);
   EXPECT_EQ(output(), "");
   EXPECT_EQ(run({"glitches", "--why", "latest"}), kRefused);
-  EXPECT_EQ(errors(), "twctl: the store has no glitch latest; it has no glitches\n");
+  EXPECT_EQ(errors(), "twctl: no glitch was recorded, or none that was asked for\n");
 }
 
 TEST_F(GlitchesCommandTest, RefusesWhatItCannotDo) {
@@ -258,6 +265,10 @@ TEST_F(GlitchesCommandTest, RefusesWhatItCannotDo) {
   EXPECT_THAT(errors(), HasSubstr("did you mean 'hour'?"));
   EXPECT_EQ(run({"glitches", "--by", "hour", "--why", "1"}), kWrongUsage);
   EXPECT_EQ(run({"glitches", "-n", "0"}), kWrongUsage);
+  EXPECT_EQ(run({"glitches", "--session", "0"}), kWrongUsage);
+  EXPECT_EQ(errors(), "twctl: --session: \"0\" is no whole number from 1\n");
+  EXPECT_EQ(run({"glitches", "--why", ""}), kRefused);
+  EXPECT_THAT(errors(), HasSubstr("the store has no glitch \"\"; the newest ones are: 14"));
   EXPECT_EQ(run({"glitches", "--since", "then"}), kWrongUsage);
 }
 
