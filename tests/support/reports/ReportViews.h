@@ -69,6 +69,20 @@ class ReportViews {
     int overloads = 1;
   };
 
+  // An overload that nobody has judged.
+  static Glitch unjudged(int event, int session, double at) {
+    return {.event = event,
+            .session = session,
+            .at = at,
+            .id = "",
+            .cause = "",
+            .firstCause = "",
+            .node = "",
+            .device = "",
+            .over = -1.0,
+            .lost = -1.0};
+  }
+
   // A glitch of a session that is there.
   void glitched(const Glitch& glitch) {
     const auto number = [](double value) { return value < 0.0 ? "NULL" : std::to_string(value); };

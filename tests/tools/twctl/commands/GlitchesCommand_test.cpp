@@ -67,16 +67,7 @@ class GlitchesCommandTest : public CommandLineTest {
                     .over = 7.0,
                     .lost = 6.0,
                     .overloads = 4});
-    views.glitched({.event = 14,
-                    .session = 2,
-                    .at = kDay + 3700.0,
-                    .id = "",
-                    .cause = "",
-                    .firstCause = "",
-                    .node = "",
-                    .device = "",
-                    .over = -1.0,
-                    .lost = -1.0});
+    views.glitched(ReportViews::unjudged(14, 2, kDay + 3700.0));
   }
 
   std::vector<std::string> lines() const {

@@ -197,7 +197,6 @@ TEST_F(ReportDataTest, CountsOverloadsByBufferSizeAndDay) {
   EXPECT_EQ(at(shortTime, {"issues", "stepSeconds"}), "3600");
 }
 
-// With one offset for all days, an overload just after midnight was counted for the day before.
 TEST_F(ReportDataTest, SaysWhoseTheGlitchesWereAndCountsOneOfTwoSessionsOnce) {
   views_.played(1, "Melody", kDay, 3600.0, "Speaker", 0.5);
   views_.played(2, "Studio", kDay, 3600.0, "Speaker", 0.5);
@@ -226,16 +225,7 @@ TEST_F(ReportDataTest, SaysWhoseTheGlitchesWereAndCountsOneOfTwoSessionsOnce) {
                    .over = 1.0,
                    .lost = 1.0,
                    .overloads = 3});
-  views_.glitched({.event = 4,
-                   .session = 1,
-                   .at = kDay + 7.0,
-                   .id = "",
-                   .cause = "",
-                   .firstCause = "",
-                   .node = "",
-                   .device = "",
-                   .over = -1.0,
-                   .lost = -1.0});
+  views_.glitched(ReportViews::unjudged(4, 1, kDay + 7.0));
   const ValueMap data = read();
   EXPECT_EQ(at(data, {"glitches", "count"}), "5");
   EXPECT_EQ(at(data, {"glitches", "judged"}), "4");
@@ -288,6 +278,7 @@ TEST_F(ReportDataTest, AStoreThatAnEarlierDaemonHasMadeHasNoGlitchesAndIsNoFailu
   EXPECT_EQ(at(read(), {"glitches", "count"}), "0");
 }
 
+// With one offset for all days, an overload just after midnight was counted for the day before.
 TEST_F(ReportDataTest, CountsOverloadsByTheDaysOfAClockThatChanges) {
   setenv("TZ", "Europe/Berlin", 1);
   tzset();
