@@ -17,6 +17,7 @@ inline const SharedString kWatchKeyRedundant("redundant");
 inline const SharedString kWatchKeyOverloads("overloads");
 inline const SharedString kWatchKeyTime("time");
 inline const SharedString kWatchKeyApplication("application");
+inline const SharedString kWatchKeyDevice("device");
 inline const SharedString kWatchKeyPayload("payload");
 inline const SharedString kWatchKeyTotal("total");
 inline const SharedString kWatchKeySessions("sessions");

@@ -14,11 +14,17 @@
 #include "service/TWReportingClientServerInstance.h"
 #include "service/TWReportingServiceDelegateProtocol.h"
 #include "session/TWReportingContext.h"
+#include "session/TWReportingKeys.h"
 #include "session/TWReportingSession.h"
 #include "session/TWReportingUtility.h"
 #include "values/ShortenedText.h"
 
 namespace tonewerk {
+
+std::string shownDevice(const TWReportingSession& session) {
+  return std::string(
+      shortened(session.previousText(TWReportingMessageKeyActiveDevices), kMaxShownDeviceBytes));
+}
 
 Value shownApplication(const ValueMap& map) {
   return shortened(TWReportingUtilityRetrieveAppName(map), kMaxShownNameBytes);
@@ -63,6 +69,7 @@ void Portion::add(const TWReportingSession& session, const std::optional<std::st
                  {kWatchKeyMessages, session.totalMessageCount()},
                  {kWatchKeyRedundant, session.redundantMessageCount()},
                  {kWatchKeyOverloads, session.overloadCount()}};
+  if (const std::string device = shownDevice(session); !device.empty()) shown.set(kWatchKeyDevice, device);
   if (!session.processIdentifiers().empty()) {
     shown.set(kWatchKeyProcessIdentifier, session.processIdentifiers().front());
   }

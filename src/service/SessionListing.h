@@ -2,12 +2,14 @@
 #pragma once
 
 #include <cstddef>
+#include <string>
 
 #include "values/Value.h"
 
 namespace tonewerk {
 
 class TWReportingServiceDelegateProtocol;
+class TWReportingSession;
 
 // The most sessions in one answer. They take at most requests::kMaxSessionListingBytes.
 inline constexpr std::size_t kMaxListedSessions = 500;
@@ -20,6 +22,12 @@ ValueMap sessionListing(const TWReportingServiceDelegateProtocol& service, std::
 
 // Names that clients choose are cut to this length.
 inline constexpr std::size_t kMaxShownNameBytes = 256;
+
+// Names of devices are cut to this length, so that the sessions of one answer fit.
+inline constexpr std::size_t kMaxShownDeviceBytes = 64;
+
+// Returns the devices that the session named last, cut to kMaxShownDeviceBytes; empty when it named none.
+std::string shownDevice(const TWReportingSession& session);
 
 // Returns the application name of a configuration or of a normalised payload, cut to kMaxShownNameBytes.
 Value shownApplication(const ValueMap& map);

@@ -29,8 +29,8 @@ void TapSubscriber::open(MessageFilter filter) {
 void TapSubscriber::offer(const TWReportingSession& session, const TWReportingSessionMessage& message) {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   if (!filter_.wants(session.reporterID(), message.category, message.type)) return;
-  SeenMessage seen{session.reporterID(), session.serviceType(), message.category,
-                   message.type,         message.isRedundant,   message.message};
+  SeenMessage seen{session.reporterID(), session.serviceType(), message.category,    message.type,
+                   message.isRedundant,  message.message,       shownDevice(session)};
   if (seen.bytes() > kMaxAnswerBytes) {
     ++missed_;
   } else {
@@ -99,18 +99,20 @@ ValueMap TapSubscriber::takeAnswer() {
 // A packed map shares its keys with others, but an answer has them.
 std::size_t TapSubscriber::SeenMessage::bytes() const {
   const Shape* shape = payload.shape();
-  return kRecordBytes + payload.bytes() + (shape == nullptr ? 0 : shape->wireBytes());
+  return kRecordBytes + payload.bytes() + device.size() + (shape == nullptr ? 0 : shape->wireBytes());
 }
 
 ValueMap TapSubscriber::SeenMessage::toValue() const {
-  return {{kWatchKeyReporterID, reporterID},
-          {kWatchKeyServiceType, serviceType},
-          {kWatchKeyCategory, category},
-          {kWatchKeyType, type},
-          {kWatchKeyRedundant, isRedundant},
-          {kWatchKeyTime, payload.number(TWReportingInternalEventEpochTime)},
-          {kWatchKeyApplication, shownApplication(payload)},
-          {kWatchKeyPayload, payload}};
+  ValueMap value{{kWatchKeyReporterID, reporterID},
+                 {kWatchKeyServiceType, serviceType},
+                 {kWatchKeyCategory, category},
+                 {kWatchKeyType, type},
+                 {kWatchKeyRedundant, isRedundant},
+                 {kWatchKeyTime, payload.number(TWReportingInternalEventEpochTime)},
+                 {kWatchKeyApplication, shownApplication(payload)}};
+  if (!device.empty()) value.set(kWatchKeyDevice, device);
+  value.set(kWatchKeyPayload, payload);
+  return value;
 }
 
 }  // namespace tonewerk

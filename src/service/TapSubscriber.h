@@ -5,6 +5,7 @@
 #include <cstdint>
 #include <deque>
 #include <memory>
+#include <string>
 
 #include "platform/RequestHandler.h"
 #include "protocol/AudioEvent.h"
@@ -31,7 +32,7 @@ class TapSubscriber final : public std::enable_shared_from_this<TapSubscriber> {
   static constexpr std::size_t kMaxBytes = std::size_t{4} << 20;
   // The most bytes of an answer. A larger message is missed.
   static constexpr std::size_t kMaxAnswerBytes = requests::kMaxMessagesBytes;
-  // The bytes that a message counts for beside its payload, here and in an answer.
+  // The bytes that a message counts for beside its payload and device, here and in an answer.
   static constexpr std::size_t kRecordBytes = 512;
   // A payload that nests deeper is missed: a frame may have 32 levels, and four of them are the answer's own.
   static constexpr std::size_t kMaxPayloadLevels = 28;
@@ -59,6 +60,7 @@ class TapSubscriber final : public std::enable_shared_from_this<TapSubscriber> {
     AudioEventType type;
     bool isRedundant;
     ValueMap payload;
+    std::string device;
 
     // An upper bound of what the message takes in an answer.
     std::size_t bytes() const;

@@ -37,6 +37,18 @@ ValueMap PreviousValues::merged() const {
   return all;
 }
 
+// What is merged is older than what is not.
+std::string PreviousValues::latestText(std::string_view key) const {
+  const ValueMap* newest = &merged_;
+  std::uint64_t order = 0;
+  for (const Latest& latest : latest_) {
+    if (latest.values.empty() || latest.order < order || !latest.values.contains(key)) continue;
+    newest = &latest.values;
+    order = latest.order;
+  }
+  return newest->text(key);
+}
+
 PreviousValues::Latest* PreviousValues::latestOf(const Shape& shape) {
   if (lastUsed_ < latest_.size() && latest_[lastUsed_].shape.get() == &shape) return &latest_[lastUsed_];
   const auto found = std::find_if(latest_.begin(), latest_.end(),

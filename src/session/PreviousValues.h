@@ -3,6 +3,8 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <string>
+#include <string_view>
 #include <vector>
 
 #include "session/KeptBytesBudget.h"
@@ -31,6 +33,9 @@ class PreviousValues {
 
   // Returns a new map with everything.
   ValueMap merged() const;
+
+  // The latest value of one key as text; empty when no message had it. Merges nothing.
+  std::string latestText(std::string_view key) const;
 
   // The bytes that are taken from the budget.
   std::size_t bytes() const { return merged_.bytes() + keptBytes_; }

@@ -563,6 +563,11 @@ ValueMap TWReportingSession::previousValues() const {
   return previousValues_.merged();
 }
 
+std::string TWReportingSession::previousText(std::string_view key) const {
+  const MutexLock lock(propertiesMutex_);
+  return previousValues_.latestText(key);
+}
+
 void TWReportingSession::addPreviousValues(const ValueMap& values) {
   assert(TWReportingUtilityIsOnReportingServerQueue());
   {

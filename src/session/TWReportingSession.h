@@ -36,8 +36,8 @@ class MessageShapes;
 // session. At start the consumers start first, then the producers, then the rest. At stop the producers
 // stop first, so that the running consumers still get the messages that producers derive.
 //
-// Used on the work queue. configuration(), previousValues(), clientProcessName() and the worker lists may
-// be read on any thread.
+// Used on the work queue. configuration(), previousValues(), previousText(), clientProcessName() and the
+// worker lists may be read on any thread.
 class TWReportingSession : public std::enable_shared_from_this<TWReportingSession> {
   struct Private {};
 
@@ -141,6 +141,8 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   const SharedString& applicationName() const { return applicationName_; }
   // The latest value of every key received.
   ValueMap previousValues() const;
+  // That of one key as text; empty when no message had it.
+  std::string previousText(std::string_view key) const;
   void addPreviousValues(const ValueMap& values);
   // Takes over the previous values of `other`, a session of this client that has left the budget, in place
   // of its own. They fit, because `other` took them from the same budget.

@@ -87,6 +87,23 @@ TEST_F(TapSubscriberTest, DescribesEachMessage) {
             R"({"twreporting_timestamp":1763634000.5,"HostApplicationDisplayID":"com.example.player"}}]})");
 }
 
+TEST_F(TapSubscriberTest, AMessageHasTheDeviceThatItsSessionNamedLast) {
+  const auto devices = [this] {
+    const ValueMap answer = next();
+    std::vector<std::string> found;
+    for (const Value& message : *answer.find("messages")->asArray())
+      found.push_back(message.asMap()->text("device"));
+    return found;
+  };
+  offer({{"number", 1}});
+  session->addPreviousValues({{"active_devices", "Speaker"}, {"number", 2}});
+  offer({{"number", 2}});
+  session->addPreviousValues({{"active_devices", std::string(1000, 'x')}});
+  offer({{"number", 3}});
+  EXPECT_THAT(devices(), ElementsAre("", "Speaker", std::string(64, 'x')));
+  EXPECT_EQ(watcher->waitingBytes(), 0U);
+}
+
 TEST_F(TapSubscriberTest, GivesEachMessageOnceInOrder) {
   offerNumbers(1, 3);
   EXPECT_THAT(numbersIn(next()), ElementsAre(1, 2, 3));

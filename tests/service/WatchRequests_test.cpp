@@ -110,17 +110,18 @@ TEST_F(WatchRequestsTest, DescribesEachSession) {
   ask(*client, "setServiceType", {7, 77});
   ask(*client, "setConfiguration", {ValueMap{{"HostApplicationDisplayID", "com.example.player"}}, 77});
   ask(*client, "startReportingSessionForID", {77});
-  send(*client, {{"volume", 0.5}}, {77});
-  send(*client, {{"volume", 0.5}}, {77});
+  send(*client, {{"volume", 0.5}, {"active_devices", "Speaker"}}, {77});
+  send(*client, {{"volume", 0.5}, {"active_devices", "Speaker"}}, {77});
   send(*client, {{"volume", 0.8}}, {77});
   test.clock.advance(12.5);
   const auto watcher = connect(12);
-  EXPECT_EQ(askOnce(*watcher, "watch.sessions", {0}).text(),
-            R"({"total":1,"sessions":[{"reporterID":77,"serviceType":7,"serviceName":")" +
-                sessionOf(0, 77)->serviceName() +
-                R"(","started":true,"singleMessageSession":false,"application":"com.example.player",)"
-                R"("messages":3,"redundant":1,"overloads":0,"processIdentifier":11,"processName":"player",)"
-                R"("seconds":12.5}]})");
+  EXPECT_EQ(
+      askOnce(*watcher, "watch.sessions", {0}).text(),
+      R"({"total":1,"sessions":[{"reporterID":77,"serviceType":7,"serviceName":")" +
+          sessionOf(0, 77)->serviceName() +
+          R"(","started":true,"singleMessageSession":false,"application":"com.example.player",)"
+          R"("messages":3,"redundant":1,"overloads":0,"device":"Speaker","processIdentifier":11,"processName":"player",)"
+          R"("seconds":12.5}]})");
 }
 
 // Overloads are counted by a worker.
@@ -208,11 +209,14 @@ TEST_F(WatchRequestsTest, APortionOfTheLongestNamesFitsIntoItsBound) {
   for (ReporterID reporterID = 1; reporterID <= 10; ++reporterID) {
     create(*longNamed, reporterID);
     ask(*longNamed, "setConfiguration", {configuration, reporterID});
+    ask(*longNamed, "startReportingSessionForID", {reporterID});
+    send(*longNamed, {{"active_devices", std::string(5000, 'x')}}, {reporterID});
   }
   const auto sessions = listSessions(*client);
   ASSERT_THAT(sessions, SizeIs(10));
   EXPECT_EQ(sessions[0].text("application").size(), 256U);
   EXPECT_EQ(sessions[0].text("processName").size(), 256U);
+  EXPECT_EQ(sessions[0].text("device").size(), 64U);
   EXPECT_LE(sessions[0].bytes() * kMaxListedSessions, requests::kMaxSessionListingBytes);
 }
 

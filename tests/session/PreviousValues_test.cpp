@@ -90,6 +90,8 @@ TEST_F(PreviousValuesTest, AgreesWithMergingEachMessage) {
     ASSERT_EQ(budget.used(), values.bytes());
     if (step % 50 == 0) {
       ASSERT_EQ(values.merged().text(), plain.text()) << step;
+      const std::string key = "key" + std::to_string(below(50));
+      ASSERT_EQ(values.latestText(key), plain.text(key)) << step << ", " << key;
     }
   }
 }
