@@ -9,6 +9,7 @@
 #include "platform/linux/channels/LinuxChanmeter.h"
 #include "tools/twctl/ToolLog.h"
 #include "tools/twctl/commands/Commands.h"
+#include "tools/twctl/input/EventFilterOptions.h"
 #include "tools/twctl/input/ValueArguments.h"
 #include "tools/twctl/show/ChannelPrinter.h"
 #include "tools/twctl/show/PagedOutput.h"
@@ -73,6 +74,13 @@ void addChannelsCommand(CLI::App& app, Tool& tool) {
       ->expected(0, 1)
       ->type_name("SECONDS")
       ->check([options](const std::string& text) { return takeInterval(text, *options); });
+  const std::string counts = "drivers count for all programs together; ";
+  EventFilterOptions::refuse(
+      command, {"--app", "--service", "--session"},
+      counts + "the view channel_value has what they counted while a session ran, see `twctl sql`");
+  EventFilterOptions::refuse(command, {"--device"}, "channels are of drivers; use --driver");
+  EventFilterOptions::refuse(command, {"--since", "--until", "-n,--limit"},
+                             "channels have only their values of now; --watch shows how they change");
   command.callback([&tool, options, interval] { showChannels(tool, *options); });
 }
 

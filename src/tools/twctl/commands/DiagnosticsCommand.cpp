@@ -210,20 +210,26 @@ void remove(Tool& tool, const DiagnosticsCommand& command) {
   }
 }
 
+void addListOptions(CLI::App& command, DiagnosticsCommand& options) {
+  options.range.addTo(command, "those");
+  EventFilterOptions::addLimit(command, options.limit);
+  EventFilterOptions::refuse(
+      command, {"--app", "--device", "--service", "--session"},
+      "what is collected does not say which session it is for; --since and --until choose its time");
+}
+
 void addDiagnosticsCommand(CLI::App& app, Tool& tool, const std::string& name, const std::string& description,
                            DiagnosticsCommand initial) {
   const auto options = std::make_shared<DiagnosticsCommand>(std::move(initial));
   CLI::App& command = addCommand(app, tool, name, description);
   command.require_subcommand(0, 1);
-  options->range.addTo(command, "those");
-  EventFilterOptions::addLimit(command, options->limit);
+  addListOptions(command, *options);
   command.callback([&tool, &command, options] {
     if (command.get_subcommands().empty()) list(tool, *options);
   });
 
   CLI::App& listing = addCommand(command, tool, "list", "All of them, oldest first; also without a word");
-  options->range.addTo(listing, "those");
-  EventFilterOptions::addLimit(listing, options->limit);
+  addListOptions(listing, *options);
   listing.callback([&tool, options] { list(tool, *options); });
 
   CLI::App& showing = addCommand(command, tool, "show", "What one is about and what was collected");

@@ -1,7 +1,6 @@
 // SPDX-License-Identifier: Apache-2.0
 #include <CLI/CLI.hpp>
 #include <cstdint>
-#include <fnmatch.h>
 #include <limits>
 #include <memory>
 #include <optional>
@@ -13,6 +12,7 @@
 #include "protocol/Requests.h"
 #include "protocol/WatchKeys.h"
 #include "tools/twctl/DaemonCalls.h"
+#include "tools/twctl/Pattern.h"
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/commands/LiveEvents.h"
 #include "tools/twctl/input/EventFilterOptions.h"
@@ -26,16 +26,18 @@ struct TailOptions {
   std::vector<ReporterID> reporterIDs;
   std::optional<std::string> category;
   std::optional<std::string> type;
+  std::optional<std::string> application;
+  std::optional<std::string> device;
   std::optional<std::string> service;
   std::int64_t count = std::numeric_limits<std::int64_t>::max();
 };
 
-// Whether the message is of a service that the options choose, which the daemon does not do.
+// Whether the message is of a session that the options choose, which the daemon does not do.
 bool isWanted(const TailOptions& options, const ValueMap& message) {
-  if (!options.service) return true;
-  const std::string name = TWReportingUtilityGenerateServiceNameFromServiceType(
-      static_cast<AudioServiceType>(message.integer(kWatchKeyServiceType)));
-  return fnmatch(options.service->c_str(), name.c_str(), 0) == 0;
+  const auto service = static_cast<AudioServiceType>(message.integer(kWatchKeyServiceType));
+  return fitsPattern(options.service, TWReportingUtilityGenerateServiceNameFromServiceType(service)) &&
+         fitsPattern(options.application, message.text(kWatchKeyApplication)) &&
+         fitsPattern(options.device, message.text(kWatchKeyDevice));
 }
 
 Argument listOf(const std::vector<ReporterID>& numbers) {
@@ -109,7 +111,9 @@ void tail(Tool& tool, const TailOptions& options) {
 
 void addTailCommand(CLI::App& app, Tool& tool) {
   CLI::App& command = addCommand(app, tool, "tail", "Messages as they arrive, until interrupted");
-  command.footer("Who reads too slowly misses messages, and is told how many. Only for trusted users.");
+  command.footer(
+      "A pattern (GLOB) may have *, ? and [...].\n"
+      "Who reads too slowly misses messages, and is told how many. Only for trusted users.");
   const auto options = std::make_shared<TailOptions>();
   command.add_option("--id", options->reporterIDs, "Only a session's; may be given several times")
       ->allow_extra_args(false)
@@ -117,7 +121,14 @@ void addTailCommand(CLI::App& app, Tool& tool) {
       ->take_all();
   command.add_option("--category", options->category, "Only of it: a name, as Playback, or a number");
   command.add_option("--type", options->type, "Only of it: a name, as Start, or a number");
+  command.add_option("--app", options->application, "Only of such applications")->type_name("GLOB");
+  command.add_option("--device", options->device, "Only of sessions that named such devices last")
+      ->type_name("GLOB");
   EventFilterOptions::addService(command, options->service, "Only of sessions");
+  EventFilterOptions::refuse(command, {"--since", "--until"},
+                             "messages are shown as they arrive; `twctl events` has those from before");
+  EventFilterOptions::refuse(command, {"--session"},
+                             "the daemon knows a session by its reporter's identifier; use --id");
   command.add_option("-n,--count", options->count, "Only so many")->check(problemWithCount);
   command.callback([&tool, options] { tail(tool, *options); });
 }

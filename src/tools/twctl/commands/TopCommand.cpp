@@ -12,11 +12,11 @@
 #include "platform/Log.h"
 #include "platform/linux/channels/LinuxChanmeter.h"
 #include "protocol/Requests.h"
-#include "protocol/WatchKeys.h"
 #include "tools/twctl/DaemonCalls.h"
 #include "tools/twctl/commands/Commands.h"
 #include "tools/twctl/commands/LiveEvents.h"
 #include "tools/twctl/commands/TopLoop.h"
+#include "tools/twctl/commands/WatchedSessions.h"
 #include "tools/twctl/input/ValueArguments.h"
 #include "tools/twctl/show/AudioHealth.h"
 #include "tools/twctl/show/SessionRates.h"
@@ -111,24 +111,6 @@ class TerminalScreen final : public LiveScreen {
   char32_t key_ = 0;
 };
 
-// Reads all sessions in portions. None when `ask` returned none.
-template <typename Ask>
-std::optional<std::vector<ValueMap>> listSessions(Ask ask) {
-  std::vector<ValueMap> sessions;
-  for (std::size_t total = 1; sessions.size() < total;) {
-    const std::optional<Value> answer = ask(Arguments{Value(sessions.size())});
-    if (!answer) return std::nullopt;
-    const ValueMap* portion = answer->asMap();
-    const Value* list = portion == nullptr ? nullptr : portion->find(kWatchKeySessions);
-    if (list == nullptr || list->asArray() == nullptr || list->asArray()->empty()) break;
-    for (const Value& session : *list->asArray()) {
-      if (session.asMap() != nullptr) sessions.push_back(*session.asMap());
-    }
-    total = static_cast<std::size_t>(std::max<std::int64_t>(portion->integer(kWatchKeyTotal), 0));
-  }
-  return sessions;
-}
-
 // Reads the driver channels of the chosen directories.
 class Channels {
  public:
@@ -169,12 +151,12 @@ void printOneFrame(const Tool& tool, DaemonCalls& daemon, double interval) {
   };
   SessionRates rates;
   Channels channels(tool);
-  const auto first = listSessions(ask);
+  const auto first = readWatchedSessions(ask);
   if (!first) return;
   rates.rowsOf(*first, steadyNow());  // only to have counts to compare with
   channels.health();
   std::this_thread::sleep_for(std::chrono::duration<double>(interval));
-  const auto second = listSessions(ask);
+  const auto second = readWatchedSessions(ask);
   if (second) printFrame(tool, rates.rowsOf(*second, steadyNow()), channels.health());
 }
 
@@ -190,7 +172,8 @@ bool showOnTerminal(Tool& tool, DaemonCalls& daemon, double interval) {
           [&screen](int descriptor) { return screen.waitReadable(descriptor); }, failure);
     };
     Channels channels(tool);
-    runTop([&ask] { return listSessions(ask); }, [&channels] { return channels.health(); }, screen, interval);
+    runTop([&ask] { return readWatchedSessions(ask); }, [&channels] { return channels.health(); }, screen,
+           interval);
   }
   if (failure) tool.status = tool.fail(failure->status, failure->problem);
   return true;

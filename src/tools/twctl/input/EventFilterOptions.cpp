@@ -12,15 +12,18 @@ namespace {
 
 constexpr const char* kAll = "all";
 
-// Refuses an option that other listings have.
-void refuse(CLI::App& command, const std::string& option, const std::string& problem) {
-  command
-      .add_option_function<std::string>(
-          option, [option, problem](const std::string&) { throw CLI::ValidationError(option, problem); })
-      ->group("");  // not in the help
-}
-
 }  // namespace
+
+void EventFilterOptions::refuse(CLI::App& command, std::initializer_list<const char*> options,
+                                const std::string& problem) {
+  for (const std::string option : options) {
+    const std::string name = option.substr(option.rfind(',') + 1);
+    command
+        .add_option_function<std::string>(
+            option, [name, problem](const std::string&) { throw CLI::ValidationError(name, problem); })
+        ->group("");  // not in the help
+  }
+}
 
 void EventFilterOptions::addTo(CLI::App& command, const std::string& what,
                                std::initializer_list<Choice> choices) {
@@ -34,25 +37,25 @@ void EventFilterOptions::addTo(CLI::App& command, const std::string& what,
   if (has(Choice::kApplication)) {
     command.add_option("--app", application_, "Only of applications" + pattern)->type_name("GLOB");
   } else {
-    refuse(command, "--app", unknown + "application they are of");
+    refuse(command, {"--app"}, unknown + "application they are of");
   }
   if (has(Choice::kDevice)) {
     command.add_option("--device", device_, "Only of sessions that played or recorded on such devices")
         ->type_name("GLOB");
   } else {
-    refuse(command, "--device", unknown + "session they are of, so it knows no device");
+    refuse(command, {"--device"}, unknown + "session they are of, so it knows no device");
   }
   if (has(Choice::kService)) {
     addService(command, service_, "Only of sessions");
   } else {
-    refuse(command, "--service", unknown + "service they are of");
+    refuse(command, {"--service"}, unknown + "service they are of");
   }
   if (has(Choice::kSession)) {
     command.add_option("--session", session_, "Only of the session of this id in twctl sessions")
         ->type_name("ID")
         ->check(problemWithCount);
   } else {
-    refuse(command, "--session", unknown + "session they are of; --since and --until choose its time");
+    refuse(command, {"--session"}, unknown + "session they are of; --since and --until choose its time");
   }
 }
 

@@ -40,6 +40,9 @@ class EventFilterOptions {
   static CLI::Option& addLimit(CLI::App& command, std::optional<std::string>& limit);
   // None for "all".
   static std::optional<std::int64_t> limitOf(const std::optional<std::string>& limit);
+  // Declares options that other listings have, such as "-n,--limit", only to refuse them with the reason.
+  static void refuse(CLI::App& command, std::initializer_list<const char*> options,
+                     const std::string& problem);
   // Declares --service, which refuses names of services that there are not.
   static CLI::Option& addService(CLI::App& command, std::optional<std::string>& service,
                                  const std::string& what);

@@ -1,11 +1,11 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "tools/twctl/serve/StateSender.h"
 
-#include <fnmatch.h>
 #include <limits>
 #include <utility>
 #include <vector>
 
+#include "tools/twctl/Pattern.h"
 #include "values/CompactJson.h"
 #include "values/Value.h"
 
@@ -49,7 +49,7 @@ ValueMap StateSender::stateOf(const DaemonWatch& daemon, const StoredReport::Rea
 }
 
 bool StateSender::isInScope(const std::string& application) const {
-  return !application_ || ::fnmatch(application_->c_str(), application.c_str(), FNM_NOESCAPE) == 0;
+  return fitsPattern(application_, application);
 }
 
 }  // namespace tonewerk

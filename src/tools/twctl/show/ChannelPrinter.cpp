@@ -1,10 +1,10 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "tools/twctl/show/ChannelPrinter.h"
 
-#include <fnmatch.h>
 #include <ostream>
 #include <utility>
 
+#include "tools/twctl/Pattern.h"
 #include "tools/twctl/Tool.h"
 #include "tools/twctl/show/ChannelText.h"
 #include "tools/twctl/show/LocalTime.h"
@@ -17,8 +17,8 @@ namespace {
 // Moves the cursor to the top left corner and clears the screen.
 constexpr char kClearTerminal[] = "\x1b[H\x1b[2J";
 
-bool fitsPattern(const std::optional<std::string>& pattern, const std::optional<std::string_view>& text) {
-  return !pattern || fnmatch(pattern->c_str(), std::string(text.value_or("")).c_str(), 0) == 0;
+bool fitsText(const std::optional<std::string>& pattern, const std::optional<std::string_view>& text) {
+  return fitsPattern(pattern, std::string(text.value_or("")));
 }
 
 Table::Cell shown(const std::optional<std::string_view>& text) { return Value(text.value_or("")); }
@@ -26,7 +26,7 @@ Table::Cell shown(const std::optional<std::string_view>& text) { return Value(te
 }  // namespace
 
 bool ChannelFilter::fits(const ChanmeterSample& sample) const {
-  return fitsPattern(driver, sample.driverName()) && fitsPattern(group, sample.group());
+  return fitsText(driver, sample.driverName()) && fitsText(group, sample.group());
 }
 
 bool ChannelPrinter::printValues() {

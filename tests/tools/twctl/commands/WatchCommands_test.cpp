@@ -1,11 +1,12 @@
 // SPDX-License-Identifier: Apache-2.0
 //
-// Tests twctl top and twctl tail with a scripted daemon.
+// Tests twctl top, tail and list with a scripted daemon.
 #include <gmock/gmock.h>
 #include <memory>
 #include <sstream>
 #include <stdlib.h>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "platform/linux/json/NlohmannJsonService.h"
@@ -177,6 +178,89 @@ TEST_F(WatchCommandsTest, TailShowsTheServicesThatAreChosen) {
   answerMessages(0, {other, message(2)});
   EXPECT_EQ(run({"tail", "-n", "1", "--service", "tele*"}), kDone);
   EXPECT_EQ(out.str(), "2025-11-20 10:20:00.500Z  77  telephony  Playback/Start  {\"number\":2}\n");
+}
+
+TEST_F(WatchCommandsTest, TailShowsTheApplicationsAndTheDevicesThatAreChosen) {
+  const auto from = [](int number, const char* application, const char* device) {
+    ValueMap made = message(number);
+    made.set("application", application);
+    made.set("device", device);
+    return Value(made);
+  };
+  ValueMap nowhere = message(4);
+  nowhere.set("application", "org.example.Player");
+  answerMessages(0, {from(1, "org.example.Player", "Speaker"), from(2, "org.example.Phone", "Headphones"),
+                     from(3, "org.example.Player", "Headphones"), nowhere});
+  EXPECT_EQ(run({"tail", "-n", "2", "--app", "*.Ph*"}), kDone);
+  EXPECT_THAT(out.str(), testing::MatchesRegex("[^\n]*\"number\":2}\n[^\n]*\"number\":2}\n"));
+  EXPECT_EQ(run({"tail", "-n", "2", "--app", "*.Player", "--device", "Head*"}), kDone);
+  EXPECT_THAT(out.str(), testing::MatchesRegex("[^\n]*\"number\":3}\n[^\n]*\"number\":3}\n"));
+}
+
+class ListCommandTest : public WatchCommandsTest {
+ protected:
+  ListCommandTest() {
+    answerSessions({sessionOf(1, 2, "org.example.Phone", "Speaker"),
+                    sessionOf(2, 4, "org.example.Player", "Headphones, Speaker"),
+                    sessionOf(3, 2, "org.example.Player", nullptr), single()});
+  }
+
+  static Value sessionOf(std::int64_t reporter, int service, const char* application, const char* device) {
+    ValueMap session{{"reporterID", reporter}, {"serviceType", service}, {"application", application}};
+    if (device != nullptr) session.set("device", device);
+    return session;
+  }
+  static Value single() {
+    return ValueMap{{"reporterID", 4},
+                    {"serviceType", 2},
+                    {"application", "org.example.Player"},
+                    {"singleMessageSession", true}};
+  }
+  std::string identifiersOf(std::vector<const char*> choices) {
+    choices.insert(choices.begin(), {"list", "--json"});
+    EXPECT_EQ(run(choices), kDone) << err.str();
+    std::string identifiers;
+    std::istringstream lines(out.str());
+    for (std::string line; std::getline(lines, line);) {
+      std::string problem;
+      identifiers += json.parse(line, problem)->asMap()->text("reporterID") + " ";
+    }
+    return identifiers;
+  }
+};
+
+TEST_F(ListCommandTest, ChoosesTheApplicationsAndTheDevicesOfSessions) {
+  EXPECT_EQ(identifiersOf({"--app", "*.Player"}), "2 3 ");
+  EXPECT_EQ(identifiersOf({"--app", "*.Player", "--service", "telephony"}), "3 ");
+  EXPECT_EQ(identifiersOf({"--device", "*Speaker"}), "1 2 ");
+  EXPECT_EQ(identifiersOf({"--device", "Head*", "--app", "*Phone"}), "");
+  EXPECT_THAT(daemon.requestsFor("getAllReporters"), IsEmpty());
+}
+
+TEST_F(ListCommandTest, SaysWhoMayNotChooseApplications) {
+  daemon.refuse("watch.sessions", kRefusal);
+  EXPECT_EQ(run({"list", "--app", "*"}), kRefused);
+  EXPECT_THAT(err.str(), HasSubstr("not permitted: this is for others"));
+  EXPECT_EQ(out.str(), "");
+}
+
+TEST_F(WatchCommandsTest, SaysWhyAListingLacksAChoiceThatOthersHave) {
+  const std::vector<std::pair<std::vector<const char*>, std::string>> refused{
+      {{"list", "--since", "1h"}, "--since: the list has the sessions of now"},
+      {{"list", "-n", "3"}, "--limit: the list has the sessions of now"},
+      {{"list", "--session", "3"}, "--session: the daemon knows a session by its reporter's identifier"},
+      {{"tail", "--until", "1h"}, "--until: messages are shown as they arrive"},
+      {{"tail", "--session", "3"}, "--session: the daemon knows a session by its reporter's identifier"},
+      {{"channels", "--app", "x"}, "--app: drivers count for all programs together"},
+      {{"channels", "--device", "x"}, "--device: channels are of drivers; use --driver"},
+      {{"channels", "-n", "1"}, "--limit: channels have only their values of now"},
+      {{"captures", "--app", "x"}, "--app: what is collected does not say which session it is for"},
+      {{"drafts", "list", "--device", "x"}, "--device: what is collected does not say which session"}};
+  for (const auto& [command, reason] : refused) {
+    EXPECT_EQ(run(command), kWrongUsage) << testing::PrintToString(command);
+    EXPECT_THAT(err.str(), HasSubstr("twctl: " + reason));
+  }
+  EXPECT_THAT(daemon.requests(), IsEmpty());
 }
 
 TEST_F(WatchCommandsTest, TailHasTheDaemonFilter) {
