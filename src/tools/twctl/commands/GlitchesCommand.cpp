@@ -16,9 +16,11 @@
 #include "tools/twctl/commands/StoreSql.h"
 #include "tools/twctl/glitches/GlitchStory.h"
 #include "tools/twctl/glitches/GlitchesTable.h"
+#include "tools/twctl/input/EventFilterOptions.h"
 #include "tools/twctl/input/Suggestion.h"
 #include "tools/twctl/input/TimeRangeOptions.h"
 #include "tools/twctl/input/ValueArguments.h"
+#include "tools/twctl/show/PagedOutput.h"
 #include "tools/twctl/show/Terminal.h"
 #include "values/CompactJson.h"
 #include "values/PrintableText.h"
@@ -31,6 +33,7 @@ constexpr std::int64_t kFirstShown = 10;
 struct GlitchesOptions {
   GlitchFilter filter;
   TimeRangeOptions range;
+  std::optional<std::string> limit;
   std::string by;
   std::optional<std::string> why;
 };
@@ -122,8 +125,7 @@ int sums(Tool& tool, SqlReader& reader, const GlitchFilter& filter, const std::s
   return kDone;
 }
 
-int list(Tool& tool, SqlReader& reader, GlitchFilter filter, std::optional<std::size_t> width) {
-  if (!filter.limit) filter.limit = kFirstShown;
+int list(Tool& tool, SqlReader& reader, const GlitchFilter& filter, std::optional<std::size_t> width) {
   std::string problem;
   bool isEmpty = true;
   GlitchesTable table(tool.out, tool.asJson, width);
@@ -145,10 +147,13 @@ int glitches(Tool& tool, const GlitchesOptions& options) {
   GlitchFilter filter = options.filter;
   filter.since = range->since;
   filter.until = range->until;
-  const auto terminal = tool.outIsTerminal ? terminalSizeOf(tool.outDescriptor) : std::nullopt;
-  const auto width = terminal ? std::optional(terminal->columns) : std::nullopt;
+  filter.limit = EventFilterOptions::limitOf(options.limit);
+  const PagedOutput pages(tool);
+  const std::optional<std::size_t> width = widthOf(tool);
   if (options.why) return why(tool, reader, *options.why, filter, width);
   if (!options.by.empty()) return sums(tool, reader, filter, options.by, width);
+  // People who ask for nothing see the last ones.
+  if (!options.limit) filter.limit = kFirstShown;
   return list(tool, reader, filter, width);
 }
 
@@ -177,14 +182,12 @@ void addGlitchesCommand(CLI::App& app, Tool& tool) {
       ->type_name("ID")
       ->excludes(by);
   options->range.addTo(command, "glitches");
-  command.add_option("-n,--limit", options->filter.limit, "Only the newest so many; 10 when it is not given")
-      ->check(problemWithCount);
+  EventFilterOptions::addLimit(command, options->limit);
   command
       .add_option("--app", options->filter.application, "Only those that such applications heard or caused")
       ->type_name("GLOB");
   command.add_option("--device", options->filter.device, "Only those on such devices")->type_name("GLOB");
-  command.add_option("--service", options->filter.service, "Only those in sessions for such services")
-      ->type_name("GLOB");
+  EventFilterOptions::addService(command, options->filter.service, "Only those in sessions");
   command
       .add_option("--session", options->filter.session,
                   "Only those in this session, the first column of `twctl "

@@ -113,6 +113,7 @@ TEST_F(GlitchesCommandTest, PrintsTheLastTenUnlessMoreAreWanted) {
   EXPECT_EQ(idsOf({}), "3 4 5 6 7 8 9 10 11 12 ");
   EXPECT_EQ(idsOf({"-n", "2"}), "11 12 ");
   EXPECT_EQ(idsOf({"-n", "100"}), "1 2 3 4 5 6 7 8 9 10 11 12 ");
+  EXPECT_EQ(idsOf({"-n", "all"}), "1 2 3 4 5 6 7 8 9 10 11 12 ");
 }
 
 TEST_F(GlitchesCommandTest, ChoosesByTimeAndByWhatTheGlitchesAre) {
@@ -261,6 +262,8 @@ TEST_F(GlitchesCommandTest, RefusesWhatItCannotDo) {
   EXPECT_EQ(run({"glitches", "--why", ""}), kRefused);
   EXPECT_THAT(errors(), HasSubstr("the store has no glitch \"\"; the newest ones are: 14"));
   EXPECT_EQ(run({"glitches", "--since", "then"}), kWrongUsage);
+  EXPECT_EQ(run({"glitches", "--service", "telefony"}), kWrongUsage);
+  EXPECT_THAT(errors(), HasSubstr("did you mean 'telephony'?"));
 }
 
 TEST_F(GlitchesCommandTest, SaysThatTheStoreHasNoGlitchesYetWhereAnEarlierDaemonMadeIt) {
