@@ -49,6 +49,8 @@ class ScriptedDaemon {
   void answer(const std::string& method, Value result) { results_[method] = std::move(result); }
   // Makes the daemon have exactly the sessions with these identifiers, all of the service type 2.
   void setSessions(std::set<std::int64_t> identifiers) { sessions_ = std::move(identifiers); }
+  // Makes the daemon end, without an answer, when this method is called.
+  void endAt(const std::string& method) { lastMethod_ = method; }
   void keepSilentAbout(const std::string& method) { silences_.insert(method); }
   void refuse(const std::string& method, ReplyError error) { errors_[method] = std::move(error); }
 
@@ -126,6 +128,7 @@ class ScriptedDaemon {
                    ValueMap{{"reporterID", isKnown ? first : 0}, {"serviceType", isKnown ? 2 : 65535}});
     }
     if (silences_.contains(method)) return;
+    if (method == lastMethod_) return end();
     if (errors_.contains(method)) return reply(errors_[method]);
     if (results_.contains(method)) return reply(std::nullopt, results_[method]);
     if (method == "startReportingSessionForID") return;
@@ -139,6 +142,7 @@ class ScriptedDaemon {
   std::map<std::string, Value> results_;
   std::map<std::string, ReplyError> errors_;
   std::set<std::string> silences_;
+  std::string lastMethod_;
   std::optional<std::set<std::int64_t>> sessions_;
   mutable Mutex mutex_;
   Condition ending_;

@@ -90,7 +90,7 @@ int examine(const Tool& tool) {
   } else {
     showToPeople(tool, findings);
   }
-  if (!checkup.daemon.isConnected) return kNoDaemon;
+  if (!checkup.daemon.isConnected || checkup.daemon.isSilent) return kNoDaemon;
   return findings.all().empty() ? kDone : kRefused;
 }
 
@@ -103,7 +103,7 @@ void addDoctorCommand(CLI::App& app, Tool& tool) {
       "Checks the socket, the daemon, owners and permissions, units, the bridge, preferences and facts,\n"
       "endpoints (a connection is made to each and closed), the clock, the store and its disk. It changes\n"
       "nothing, and says what the caller may not see.\n"
-      "Exit status: 0 nothing is wrong; 1 something is; 3 no daemon, and the rest was checked.");
+      "Exit status: 0 nothing is wrong; 1 something is; 3 no daemon answers, and the rest was checked.");
   const auto lists = std::make_shared<bool>(false);
   command.add_flag("--list", *lists, "Lists what there is to find, and checks nothing");
   command.callback([&tool, lists] {

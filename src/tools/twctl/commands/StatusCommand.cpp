@@ -34,7 +34,8 @@ int showStatus(const Tool& tool) {
   } else {
     report.print(tool.out, widthOf(tool));
   }
-  if (!report.daemon.isConnected) return tool.fail(kNoDaemon, report.daemon.problem);
+  if (!report.daemon.isConnected || report.daemon.isSilent)
+    return tool.fail(kNoDaemon, report.daemon.problem);
   return report.problems().empty() ? kDone : kRefused;
 }
 
@@ -44,7 +45,8 @@ void addStatusCommand(CLI::App& app, Tool& tool) {
   CLI::App& command =
       addCommand(app, tool, "status", "How the daemon stands, its store, its sinks, and what is wrong");
   command.footer(
-      "Without a command, twctl is twctl status. Exit status: 0 well; 1 something is wrong; 3 no daemon.\n"
+      "Without a command, twctl is twctl status. Exit status: 0 well; 1 something is wrong; 3 no daemon "
+      "answers.\n"
       "For each user it shows what is held, the most that may be held now, and how often more was refused;\n"
       "trusted users see all users, others themselves. Only trusted users see the sinks (what waits to be\n"
       "written, what was dropped, for how long it hangs), the endpoints, and the last errors of the daemon.");

@@ -64,6 +64,7 @@ DaemonReport askDaemon(const Tool& tool) {
       connection.call(requests::kWatchAccounts.name, {}, kAnswerTimeout, error);
   const ValueMap* listing = answer && answer->result ? answer->result->asMap() : nullptr;
   if (!answer) {
+    report.isSilent = true;
     report.problem = "the daemon does not answer (" + error.message() + ")";
   } else if (answer->error) {
     report.problem = DaemonCalls::describe(requests::kWatchAccounts.name, *answer->error);

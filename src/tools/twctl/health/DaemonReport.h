@@ -17,6 +17,8 @@ struct DaemonReport {
   std::string problem;  // why it does not answer
   // A daemon listens, but did not answer, or with an error.
   bool isConnected = false;
+  // A daemon listens, but did not answer at all.
+  bool isSilent = false;
 
   ValueMap daemon;  // empty from a daemon that is too old to say it
   ValueArray accounts;
@@ -31,7 +33,8 @@ struct DaemonReport {
   Directories directoriesOr(const Directories& own) const;
 };
 
-// Asks the daemon that the tool's socket paths find. Waits 10 s at most, and prints nothing.
+// Asks the daemon that the tool's socket paths find. Waits at most 10 s for each of two
+// answers, and 1 s for the connection's end, and prints nothing.
 [[nodiscard]] DaemonReport askDaemon(const Tool& tool);
 
 // Reads an answer to watch.accounts.

@@ -105,6 +105,13 @@ TEST_F(StatusCommandTest, ADaemonThatRefusesIsWrong) {
   EXPECT_THAT(out.str(), HasSubstr("daemon    watch.accounts: unknown method"));
 }
 
+// The exit status was that of a daemon with troubles.
+TEST_F(StatusCommandTest, ADaemonThatDoesNotAnswerIsNone) {
+  daemon.endAt("watch.accounts");
+  EXPECT_EQ(run({"status"}), kNoDaemon);
+  EXPECT_THAT(out.str(), HasSubstr("daemon    the daemon does not answer ("));
+}
+
 TEST_F(StatusCommandTest, LooksAtTheStoreOfTheDaemonThatAnswers) {
   daemon.answer("watch.accounts", ValueMap{{"total", 0},
                                            {"accounts", ValueArray{}},
