@@ -13,6 +13,7 @@
 
 #include "protocol/WatchKeys.h"
 #include "tools/twctl/health/Checkup.h"
+#include "tools/twctl/health/ShellWord.h"
 #include "tools/twctl/show/UserName.h"
 
 namespace tonewerk {
@@ -110,7 +111,7 @@ void checkSocket(const Checkup& checkup, Findings& findings) {
   for (const std::string& path : checkup.sockets) {
     struct stat status {};
     if (stat(path.c_str(), &status) == 0 && (status.st_mode & S_IWOTH) != 0)
-      findings.add("open-socket", path + " can be used by every user", "chmod o-rwx " + path);
+      findings.add("open-socket", path + " can be used by every user", "chmod o-rwx " + shellWord(path));
   }
   if (checkup.daemon.isConnected) return;
   const std::optional<std::string> variable = leadingVariable(checkup.around);

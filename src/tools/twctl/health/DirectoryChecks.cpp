@@ -6,6 +6,7 @@
 #include <sys/stat.h>
 
 #include "tools/twctl/health/Checkup.h"
+#include "tools/twctl/health/ShellWord.h"
 #include "tools/twctl/show/UserName.h"
 
 namespace tonewerk {
@@ -26,20 +27,20 @@ void checkPlace(const Checkup& checkup, const Place& place, Findings& findings) 
       findings.add("missing-directory", place.path + " is missing", checkup.restart());
     return;
   }
+  const std::string word = shellWord(place.path);
   const uid_t user = checkup.daemonUser();
   const bool isOwners = status.st_uid == user || (place.mayBeRoots && status.st_uid == 0);
   if (!isOwners) {
     findings.add(
         "foreign-owner",
         place.path + " belongs to " + userName(status.st_uid) + ", and the daemon runs as " + userName(user),
-        "sudo chown " + userName(user) + ": " + place.path);
+        "sudo chown " + userName(user) + ": " + word);
   }
   if (!place.isDirectory) return;
   if ((status.st_mode & S_IWOTH) != 0 && (status.st_mode & S_ISVTX) == 0)
-    findings.add("open-directory", place.path + " can be written by every user", "chmod o-w " + place.path);
+    findings.add("open-directory", place.path + " can be written by every user", "chmod o-w " + word);
   if (isOwners && status.st_uid == user && (status.st_mode & S_IRWXU) != S_IRWXU)
-    findings.add("closed-directory", place.path + " cannot be written by its owner",
-                 "chmod u+rwx " + place.path);
+    findings.add("closed-directory", place.path + " cannot be written by its owner", "chmod u+rwx " + word);
 }
 
 }  // namespace

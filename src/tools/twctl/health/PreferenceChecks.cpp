@@ -14,6 +14,7 @@
 #include "platform/linux/store/StoreMetricon.h"
 #include "protocol/WatchKeys.h"
 #include "tools/twctl/health/Checkup.h"
+#include "tools/twctl/health/ShellWord.h"
 #include "tools/twctl/input/PreferenceCheck.h"
 #include "values/ClosestName.h"
 
@@ -40,7 +41,7 @@ std::optional<ValueMap> readToml(const Checkup& checkup, const std::string& path
   const bool isReadable = (status.st_mode & (isOwn ? S_IRUSR : S_IRGRP | S_IROTH)) != 0;
   if (!isReadable && checkup.daemonUser() != 0)
     findings.add("unreadable-file", path + " cannot be read by the daemon's user",
-                 "sudo chmod " + std::string(isOwn ? "u+r " : "o+r ") + path);
+                 "sudo chmod " + std::string(isOwn ? "u+r " : "o+r ") + shellWord(path));
   std::string problem;
   std::optional<ValueMap> values = parseToml(text, problem);
   if (!values) findings.add("broken-file", path + ":" + problem, "mend the line in " + path);
@@ -50,8 +51,7 @@ std::optional<ValueMap> readToml(const Checkup& checkup, const std::string& path
 // The value as it is typed for `twctl defaults write`.
 std::string typed(const Value& value) {
   const bool* boolean = value.asBoolean();
-  const std::string text = boolean == nullptr ? value.text() : (*boolean ? "true" : "false");
-  return text.find_first_of(" \"'[]{}$") == std::string::npos ? text : "'" + text + "'";
+  return shellWord(boolean == nullptr ? value.text() : (*boolean ? "true" : "false"));
 }
 
 class PreferenceFiles {
@@ -79,9 +79,11 @@ class PreferenceFiles {
     const std::optional<ValueMap> values = readToml(checkup_, path, findings_);
     if (knownKeys(domain).empty()) {
       if (const auto meant = closestTo(domain, preferenceDomains()))
-        findings_.add("unknown-domain", path + " is not read; did you mean " + *meant + "?",
-                      "mv " + path + " " + std::filesystem::path(path).parent_path().string() + "/" + *meant +
-                          std::string(kEnding));
+        findings_.add(
+            "unknown-domain", path + " is not read; did you mean " + *meant + "?",
+            "mv " + shellWord(path) + " " +
+                shellWord(
+                    std::filesystem::path(path).replace_filename(*meant + std::string(kEnding)).string()));
       return;
     }
     if (!values) return;
@@ -89,7 +91,8 @@ class PreferenceFiles {
     for (const ValueMap::Entry& entry : *values) {
       const std::string key = entry.key.string();
       for (const std::string& line : unknownKeys(domain, {{entry.key, entry.value}})) {
-        findings_.add("unknown-key", inFile(path, line), isWritten ? remove + key : mend(path, key));
+        findings_.add("unknown-key", inFile(path, line),
+                      isWritten ? remove + shellWord(key) : mend(path, key));
       }
       for (const std::string& line : preferenceProblems(domain, key, entry.value))
         addWrong(path, domain, key, line, isWritten);
@@ -209,13 +212,14 @@ void checkEndpoints(const Checkup& checkup, Findings& findings) {
     const Address address = addressOf(endpoint.url);
     const std::string problem = checkup.around.reach(address.host, address.port);
     if (!problem.empty())
-      findings.add("unreachable-endpoint", endpoint.base + ": " + problem, "curl -v " + endpoint.base);
+      findings.add("unreachable-endpoint", endpoint.base + ": " + problem,
+                   "curl -v " + shellWord(endpoint.base));
   }
   for (const ValueMap& endpoint : mapsIn(checkup.daemon.endpoints.value_or(ValueArray()))) {
     const std::string problem = endpoint.text(kWatchKeyProblem);
     if (!problem.empty())
       findings.add("failing-endpoint", endpoint.text(kWatchKeyName) + ": " + problem,
-                   "curl -v " + endpoint.text(kWatchKeyName));
+                   "curl -v " + shellWord(endpoint.text(kWatchKeyName)));
   }
 }
 

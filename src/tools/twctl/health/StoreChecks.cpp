@@ -9,6 +9,7 @@
 #include "platform/PreferenceSchema.h"
 #include "protocol/WatchKeys.h"
 #include "tools/twctl/health/Checkup.h"
+#include "tools/twctl/health/ShellWord.h"
 #include "tools/twctl/health/StatusReport.h"
 #include "tools/twctl/show/LocalTime.h"
 #include "tools/twctl/show/UserName.h"
@@ -54,7 +55,7 @@ void checkAccount(const Checkup& checkup, const ValueMap& account, Findings& fin
 }
 
 void checkSinks(const Checkup& checkup, Findings& findings) {
-  const std::string look = "df -h " + checkup.directories.state;
+  const std::string look = "df -h " + shellWord(checkup.directories.state);
   for (const ValueMap& sink : mapsIn(checkup.daemon.sinks.value_or(ValueArray()))) {
     const std::string name = sink.text(kWatchKeyName);
     const std::int64_t hangs = sink.integer(kWatchKeyHangs);
@@ -115,7 +116,7 @@ void checkStore(const Checkup& checkup, Findings& findings) {
                                     " has made the store; this one uses " + store.path);
   if (store.hasDamagedCopy)
     findings.add("damaged-store", store.path + ".corrupt is a store that was damaged",
-                 "rm " + store.path + ".corrupt");
+                 "rm " + shellWord(store.path + ".corrupt"));
   const std::optional<Surroundings::Space> space = checkup.around.space(checkup.directories.state);
   if (!space) return;
   const double wanted = std::max(0.0, checkup.storeMegabytes * kMebibyte - static_cast<double>(store.bytes));

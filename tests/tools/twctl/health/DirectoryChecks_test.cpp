@@ -56,5 +56,13 @@ TEST_F(DirectoryChecksTest, FindWhatItsOwnerMayNotWrite) {
   EXPECT_THAT(find(checkDirectories), ElementsAre(StartsWith("closed-directory: " + directory.path("logs"))));
 }
 
+TEST_F(DirectoryChecksTest, RemediesQuotePathsForTheShell) {
+  checkup.directories.state = directory.path("my state");
+  std::filesystem::create_directory(checkup.directories.state);
+  allow("my state", 0757);
+  (void)find(checkDirectories);
+  EXPECT_THAT(remedies, testing::Contains("chmod o-w '" + directory.path("my state") + "'"));
+}
+
 }  // namespace
 }  // namespace tonewerk

@@ -53,6 +53,17 @@ TEST_F(PreferenceChecksTest, FindAKeyThatTheDaemonDoesNotRead) {
   EXPECT_THAT(remedies[0], StartsWith("edit or remove max_dais in "));
 }
 
+// A remedy is there to be copied into a shell.
+TEST_F(PreferenceChecksTest, RemediesQuoteNamesForTheShell) {
+  writeState("com.orvane.linkreport", "\"$(id) x\" = 1\nbackends = [\"https://host.example/a?b&c\"]\n");
+  (void)find(checkPreferences);
+  EXPECT_EQ(remedies.at(0), "twctl defaults delete com.orvane.linkreport '$(id) x'");
+  unreachable = "no route";
+  checkup.daemon.endpoints = ValueArray{ValueMap{{"name", "https://host.example/a&b"}, {"problem", "404"}}};
+  (void)find(checkEndpoints);
+  EXPECT_EQ(remedies.back(), "curl -v 'https://host.example/a&b'");
+}
+
 TEST_F(PreferenceChecksTest, FindAValueThatTheKeyCannotHave) {
   writeState("com.orvane.tonewerk.store", "max_days = \"soon\"\n");
   EXPECT_THAT(find(checkPreferences),
