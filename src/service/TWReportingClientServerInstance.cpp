@@ -415,7 +415,9 @@ TWReportingClientServerInstance::Session TWReportingClientServerInstance::ownSes
 
 TWReportingClientServerInstance::Session TWReportingClientServerInstance::makeSession(
     ReporterID reporterID) const {
-  return TWReportingSession::initWithID(reporterID, {processIdentifier_}, budget_, shapes_);
+  Session session = TWReportingSession::initWithID(reporterID, {processIdentifier_}, budget_, shapes_);
+  session->setOwnerProcessName(SharedString(clientProcessName().value_or("")));
+  return session;
 }
 
 // One session after the other, because a stop may take long and other users wait.

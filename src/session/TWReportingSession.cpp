@@ -173,8 +173,8 @@ void TWReportingSession::beginLife() {
 }
 
 void TWReportingSession::enterLife(const std::optional<SessionEnd>& end) {
-  TWReportingContext::current().platform().sessionBook->enter(life_, knownApplication(),
-                                                              clientProcessName().value_or(""), end);
+  TWReportingContext::current().platform().sessionBook->enter(life_, knownApplication(), ownerProcessName_,
+                                                              end);
 }
 
 SharedString TWReportingSession::knownApplication() const {

@@ -134,6 +134,10 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   const ProcessIdentifiers& processIdentifiers() const { return processIdentifiers_; }
   std::optional<std::string> clientProcessName() const;
   void setClientProcessName(std::optional<std::string> name);
+  // The name of the process that the session book enters, empty when it is not known. Unlike
+  // clientProcessName(), all sessions of a client have it, also one that replaces another on a change of
+  // service type. To be set before the start.
+  void setOwnerProcessName(SharedString name) { ownerProcessName_ = std::move(name); }
   AudioServiceType serviceType() const { return serviceType_; }
   const std::string& serviceName() const { return serviceName_; }
   ValueMap configuration() const;
@@ -264,6 +268,7 @@ class TWReportingSession : public std::enable_shared_from_this<TWReportingSessio
   std::uint64_t unkeptMessageCount_ = 0;  // delivered but not stored for lack of room, and not logged yet
   std::vector<Consumer> consumers_;       // in the order of consumingMessageWorkers(); workers_ owns them
   SharedString applicationName_;          // the one of configuration_
+  SharedString ownerProcessName_;
 
   // The properties that any thread may read. Only the work queue writes them.
   mutable Mutex propertiesMutex_;

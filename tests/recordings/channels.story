@@ -1,4 +1,4 @@
-Session 1: org.example.Player (process unknown, user 1000) for longformaudio, reporter 7.
+Session 1: org.example.Player (process recording, user 1000) for longformaudio, reporter 7.
 It began at 2026-01-01 00:00:00Z and ended at 2026-01-01 00:00:05Z, after 5 s: it was stopped.
 0 messages, 0 of them redundant; 0 overloads; 0 s active.
 
@@ -22,7 +22,7 @@ Input summaries: 0. A stretch of input must be longer than 0.5 s.
 
 What was forwarded of it is not known: the store does not record sendings by session.
 --------
-Session 2: org.example.Player (process unknown, user 1000) for longformaudio, reporter 8.
+Session 2: org.example.Player (process recording, user 1000) for longformaudio, reporter 8.
 It began at 2026-01-01 00:00:06Z and ended at 2026-01-01 00:00:07Z, after 1 s: it was stopped.
 0 messages, 0 of them redundant; 0 overloads; 0 s active.
 

@@ -1,4 +1,4 @@
-Session 1: org.example.Player (process unknown, user 1001) for longformaudio, reporter 7.
+Session 1: org.example.Player (process player, user 1001) for longformaudio, reporter 7.
 It began at 2026-01-01 00:00:01Z and ended at 2026-01-01 00:00:07Z, after 6 s: its client had gone.
 3 messages, 0 of them redundant; 0 overloads; 0 s active.
 
@@ -23,7 +23,7 @@ Input summaries: 0. A stretch of input must be longer than 0.5 s.
 
 What was forwarded of it is not known: the store does not record sendings by session.
 --------
-Session 2: org.example.Phone (process unknown, user 1002) for telephony, reporter 7.
+Session 2: org.example.Phone (process phone, user 1002) for telephony, reporter 7.
 It began at 2026-01-01 00:00:01Z and ended at 2026-01-01 00:00:08Z, after 7 s: it was stopped.
 1 message, 0 of them redundant; 0 overloads; 0 s active.
 

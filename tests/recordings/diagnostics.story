@@ -1,4 +1,4 @@
-Session 1: an unknown application (process unknown, user 1000) for haptics, reporter 3001.
+Session 1: an unknown application (process recording, user 1000) for haptics, reporter 3001.
 It began at 2026-01-01 00:00:00.100Z and ended at 2026-01-01 00:01:18.500Z, after 1:18: it was
 stopped.
 2 messages, 0 of them redundant; 0 overloads; 0 s active.
@@ -23,7 +23,7 @@ Input summaries: 0. A stretch of input must be longer than 0.5 s.
 
 What was forwarded of it is not known: the store does not record sendings by session.
 --------
-Session 2: an unknown application (process unknown, user 1000) for alarms, reporter 3002.
+Session 2: an unknown application (process recording, user 1000) for alarms, reporter 3002.
 It began at 2026-01-01 00:00:00.100Z and ended at 2026-01-01 00:01:18.500Z, after 1:18: it was
 stopped.
 3 messages, 0 of them redundant; 0 overloads; 0 s active.
@@ -54,7 +54,7 @@ Issues
 
 What was forwarded of it is not known: the store does not record sendings by session.
 --------
-Session 3: org.example.Ringwork (process unknown, user 1000) for telephony, reporter 3003.
+Session 3: org.example.Ringwork (process recording, user 1000) for telephony, reporter 3003.
 It began at 2026-01-01 00:00:00.100Z and ended at 2026-01-01 00:01:18.500Z, after 1:18: it was
 stopped.
 4 messages, 0 of them redundant; 0 overloads; 0 s active.

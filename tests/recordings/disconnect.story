@@ -1,4 +1,4 @@
-Session 1: org.example.Player (process unknown, user 1000) for longformaudio, reporter 7.
+Session 1: org.example.Player (process player, user 1000) for longformaudio, reporter 7.
 It began at 2026-01-01 00:00:00Z and ended at 2026-01-01 00:00:06Z, after 6 s: its client had gone.
 2 messages, 0 of them redundant; 0 overloads; 0 s active.
 
@@ -26,7 +26,7 @@ Input summaries: 0. A stretch of input must be longer than 0.5 s.
 
 What was forwarded of it is not known: the store does not record sendings by session.
 --------
-Session 2: org.example.Phone (process unknown, user 1000) for telephony, reporter 8.
+Session 2: org.example.Phone (process player, user 1000) for telephony, reporter 8.
 It began at 2026-01-01 00:00:00Z and ended at 2026-01-01 00:00:05Z, after 5 s: a new session of the
 same client replaced it.
 1 message, 0 of them redundant; 0 overloads; 0 s active.
@@ -49,7 +49,7 @@ No producer looked for stretches.
 
 What was forwarded of it is not known: the store does not record sendings by session.
 --------
-Session 4: org.example.Player (process unknown, user 1000) for longformaudio, reporter 7.
+Session 4: org.example.Player (process player, user 1000) for longformaudio, reporter 7.
 It began at 2026-01-01 00:00:08Z and ended at 2026-01-01 00:00:09Z, after 1 s: a new session of the
 same client replaced it.
 0 messages, 0 of them redundant; 0 overloads; 0 s active.

@@ -1,4 +1,4 @@
-Session 1: org.example.Player (process unknown, user 1000) for longformaudio, reporter 2001.
+Session 1: org.example.Player (process recording, user 1000) for longformaudio, reporter 2001.
 It began at 2026-01-01 00:00:00.100Z and ended at 2026-01-01 00:00:01.100Z, after 1 s: it was
 stopped.
 9 messages, 0 of them redundant; 1 overload; 30 s active.

@@ -1,4 +1,4 @@
-Session 1: org.example.Player (process unknown, user 1000) for longformaudio, reporter 7.
+Session 1: org.example.Player (process recording, user 1000) for longformaudio, reporter 7.
 It began at 2026-01-01 00:00:00Z and ended at 2026-01-01 00:00:05Z, after 5 s: it was stopped.
 3 messages, 0 of them redundant; 3 overloads; 0 s active.
 
@@ -27,7 +27,7 @@ Issues
 
 What was forwarded of it is not known: the store does not record sendings by session.
 --------
-Session 2: org.example.Studio (process unknown, user 1000) for longformaudio, reporter 8.
+Session 2: org.example.Studio (process recording, user 1000) for longformaudio, reporter 8.
 It began at 2026-01-01 00:00:00Z and ended at 2026-01-01 00:00:05Z, after 5 s: it was stopped.
 1 message, 0 of them redundant; 1 overload; 0 s active.
 

@@ -1,4 +1,4 @@
-Session 1: org.example.Game (process unknown, user 1000) for haptics, reporter 7.
+Session 1: org.example.Game (process recording, user 1000) for haptics, reporter 7.
 It began at 2026-01-01 00:00:00Z and ended at 2026-01-01 00:00:09Z, after 9 s: it was stopped.
 6 messages, 0 of them redundant; 0 overloads; 0 s active.
 
@@ -23,7 +23,7 @@ Input summaries: 0. A stretch of input must be longer than 0.5 s.
 
 What was forwarded of it is not known: the store does not record sendings by session.
 --------
-Session 2: an unknown application (process unknown, user 1000) for haptics, reporter 8.
+Session 2: an unknown application (process recording, user 1000) for haptics, reporter 8.
 It began at 2026-01-01 00:00:07Z and ended at 2026-01-01 00:00:09Z, after 2 s: it was stopped.
 1 message, 0 of them redundant; 0 overloads; 0 s active.
 

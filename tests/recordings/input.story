@@ -1,4 +1,4 @@
-Session 1: org.example.Phone (process unknown, user 1000) for telephony, reporter 7.
+Session 1: org.example.Phone (process recording, user 1000) for telephony, reporter 7.
 It began at 2026-01-01 00:00:00Z and ended at 2026-01-01 00:00:21Z, after 21 s: it was stopped.
 10 messages, 0 of them redundant; 0 overloads; 19.5 s active.
 

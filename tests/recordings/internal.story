@@ -1,4 +1,4 @@
-Session 1: org.example.Ringwork (process unknown, user 1000) for telephony, reporter 7.
+Session 1: org.example.Ringwork (process recording, user 1000) for telephony, reporter 7.
 It began at 2026-01-01 00:00:00Z and ended at 2026-01-01 00:00:34Z, after 34 s: it was stopped.
 5 messages, 0 of them redundant; 0 overloads; 0 s active.
 
@@ -25,7 +25,7 @@ Input summaries: 0. A stretch of input must be longer than 0.5 s.
 
 What was forwarded of it is not known: the store does not record sendings by session.
 --------
-Session 2: org.example.Player (process unknown, user 1000) for alarms, reporter 8.
+Session 2: org.example.Player (process recording, user 1000) for alarms, reporter 8.
 It began at 2026-01-01 00:00:00Z and ended at 2026-01-01 00:00:34Z, after 34 s: it was stopped.
 4 messages, 0 of them redundant; 0 overloads; 0 s active.
 

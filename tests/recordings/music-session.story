@@ -1,4 +1,4 @@
-Session 1: org.example.Player (process unknown, user 1000) for longformaudio, reporter 1001.
+Session 1: org.example.Player (process recording, user 1000) for longformaudio, reporter 1001.
 It began at 2026-01-01 00:00:00.100Z and ended at 2026-01-01 00:00:06.200Z, after 6 s: it was
 stopped.
 8 messages, 0 of them redundant; 1 overload; 6 s active.

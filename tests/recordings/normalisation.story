@@ -1,4 +1,4 @@
-Session 1: org.example.Player (process unknown, user 1000) for longformaudio, reporter 7.
+Session 1: org.example.Player (process recording, user 1000) for longformaudio, reporter 7.
 It began at 2025-11-20 10:18:00Z and ended at 2025-11-20 10:18:08Z, after 8 s: it was stopped.
 7 messages, 0 of them redundant; 0 overloads; 0 s active.
 

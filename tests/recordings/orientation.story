@@ -1,4 +1,4 @@
-Session 1: org.example.Player (process unknown, user 1000) for longformaudio, reporter 7.
+Session 1: org.example.Player (process recording, user 1000) for longformaudio, reporter 7.
 It began at 2026-01-01 00:00:00Z and ended at 2026-01-01 00:00:10Z, after 10 s: it was stopped.
 3 messages, 0 of them redundant; 0 overloads; 0 s active.
 

@@ -1,4 +1,4 @@
-Session 1: org.example.Player (process unknown, user 1000) for longformaudio, reporter 7.
+Session 1: org.example.Player (process recording, user 1000) for longformaudio, reporter 7.
 It began at 2026-01-01 00:00:00Z and ended at 2026-01-01 00:00:06Z, after 6 s: it was stopped.
 2 messages, 0 of them redundant; 0 overloads; 4 s active.
 
@@ -27,7 +27,7 @@ Input summaries: 0. A stretch of input must be longer than 0.5 s.
 
 What was forwarded of it is not known: the store does not record sendings by session.
 --------
-Session 2: org.example.Player (process unknown, user 1000) for longformaudio, reporter 7.
+Session 2: org.example.Player (process recording, user 1000) for longformaudio, reporter 7.
 It began at 2026-01-01 00:00:10Z and ended at 2026-01-01 00:00:16Z, after 6 s: it was stopped.
 3 messages, 0 of them redundant; 0 overloads; 3 s active.
 
@@ -56,7 +56,7 @@ Input summaries: 0. A stretch of input must be longer than 0.5 s.
 
 What was forwarded of it is not known: the store does not record sendings by session.
 --------
-Session 3: org.example.Player (process unknown, user 1000) for longformaudio, reporter 7.
+Session 3: org.example.Player (process recording, user 1000) for longformaudio, reporter 7.
 It began at 2026-01-01 00:00:18Z and ended at 2026-01-01 00:00:19Z, after 1 s: it was stopped.
 0 messages, 0 of them redundant; 0 overloads; 0 s active.
 

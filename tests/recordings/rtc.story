@@ -1,4 +1,4 @@
-Session 1: org.example.Player (process unknown, user 1000) for longformaudio, reporter 7.
+Session 1: org.example.Player (process recording, user 1000) for longformaudio, reporter 7.
 It began at 2026-01-01 00:00:00Z and ended at 2026-01-01 00:00:04Z, after 4 s: it was stopped.
 3 messages, 1 of them redundant; 0 overloads; 0 s active.
 
@@ -19,7 +19,7 @@ Input summaries: 0. A stretch of input must be longer than 0.5 s.
 
 What was forwarded of it is not known: the store does not record sendings by session.
 --------
-Session 2: org.example.Library (process unknown, user 1000) for apiusage, reporter 8.
+Session 2: org.example.Library (process recording, user 1000) for apiusage, reporter 8.
 It began at 2026-01-01 00:00:00Z and ended at 2026-01-01 00:00:04Z, after 4 s: it was stopped.
 2 messages, 0 of them redundant; 0 overloads; 0 s active.
 
@@ -39,7 +39,7 @@ Input summaries: 0. A stretch of input must be longer than 0.5 s.
 
 What was forwarded of it is not known: the store does not record sendings by session.
 --------
-Session 3: org.example.Player (process unknown, user 1000) for test, reporter 9.
+Session 3: org.example.Player (process recording, user 1000) for test, reporter 9.
 It began at 2026-01-01 00:00:00Z and ended at 2026-01-01 00:00:04Z, after 4 s: it was stopped.
 2 messages, 0 of them redundant; 0 overloads; 0 s active.
 
@@ -59,7 +59,7 @@ Input summaries: 0. A stretch of input must be longer than 0.5 s.
 
 What was forwarded of it is not known: the store does not record sendings by session.
 --------
-Session 4: org.example.Player (process unknown, user 1000) for longformaudio, reporter 10.
+Session 4: org.example.Player (process recording, user 1000) for longformaudio, reporter 10.
 It began at 2026-01-01 00:00:05Z and ended at 2026-01-01 00:00:06Z, after 1 s: it was stopped.
 0 messages, 0 of them redundant; 0 overloads; 0 s active.
 

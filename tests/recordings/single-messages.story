@@ -10,7 +10,7 @@ No producer looked for stretches.
 
 What was forwarded of it is not known: the store does not record sendings by session.
 --------
-Session 2: org.example.Player (process unknown, user 1000) for longformaudio, reporter 7.
+Session 2: org.example.Player (process tool, user 1000) for longformaudio, reporter 7.
 It began at 2026-01-01 00:00:04Z and ended at 2026-01-01 00:00:13Z, after 9 s: it was stopped.
 1 message, 0 of them redundant; 0 overloads; 0 s active.
 

@@ -160,6 +160,18 @@ TEST_F(RequestTest, ChangingTheServiceTypeReplacesAStartedSessionByAnUnstartedOn
                               Contains("service type 2 set for reporter  77")));
 }
 
+// The session that comes with a change of service type had no process in the store.
+TEST_F(RequestTest, TheBookNamesTheProcessOfEachSessionOfAClient) {
+  test.processes.setName(12, "player");
+  const auto player = connect(12);
+  start(*player, 77);
+  ask(*player, "setServiceType", {2, 77});
+  EXPECT_EQ(sessionOf(1, 77)->clientProcessName(), std::nullopt);
+  ask(*player, "startReportingSessionForID", {77});
+  ASSERT_FALSE(test.sessionBook.entries().empty());
+  for (const auto& entry : test.sessionBook.entries()) EXPECT_EQ(entry.process, "player");
+}
+
 TEST_F(RequestTest, SettingTheServiceTypeOfAnUnknownSessionDoesNothingAndIsAnswered) {
   EXPECT_EQ(askOnce(*client, "setServiceType", {2, 5}), Value(true));
   EXPECT_EQ(askOnce(*client, "setServiceType", {2, 0}), Value(true));

@@ -27,7 +27,7 @@ class SessionLifeTest : public ReportingTest {
 TEST_F(SessionLifeTest, BeginsWithTheStartAndEndsWithTheStop) {
   const auto session = makeSession(77);
   session->setServiceType(2);
-  session->setClientProcessName("phone");
+  session->setOwnerProcessName(SharedString("phone"));
   const ValueMap configuration{{"HostApplicationDisplayID", "org.example.Phone"}};
   ASSERT_TRUE(session->updateConfigurationWithContentsOfConfiguration(&configuration));
   EXPECT_THAT(entries(), IsEmpty());
