@@ -129,6 +129,14 @@ TEST_F(CommandLineTest, SaysInOneLineWhatIsWrong) {
       {{"events", "--limit", "0"}, "--limit: \"0\" is no whole number from 1"},
       {{"tail", "--count", "x"}, "--count: \"x\" is no whole number from 1"},
       {{"events", "--limit"}, "--limit needs a value"},
+      {{"session", "x"}, "ID: \"x\" is no whole number from 1"},
+      {{"session", "1.5"}, "ID: \"1.5\" is no whole number from 1"},
+      {{"session", "99999999999999999999"}, "ID: \"99999999999999999999\" is no whole number from 1"},
+      {{"explain", "0"}, "EVENT: \"0\" is no whole number from 1"},
+      {{"explain", "--session", "-1"}, "--session: \"-1\" is no whole number from 1"},
+      {{"glitches", "--session", "0x10"}, "--session: \"0x10\" is no whole number from 1"},
+      {{"report", "--session", "0"}, "--session: \"0\" is no whole number from 1"},
+      {{"serve", "--session", "x"}, "--session: \"x\" is no whole number from 1"},
       {{"paths", "stor"}, "there is no path 'stor'; did you mean 'store'?"},
   };
   for (const auto& [command, problem] : wrong) {

@@ -65,8 +65,10 @@ void addChannelsCommand(CLI::App& app, Tool& tool) {
   const auto options = std::make_shared<ChannelsOptions>();
   // The parser calls no other function for an option whose value is left out.
   command.parse_complete_callback([&command, options] { options->watches = command.count("--watch") > 0; });
-  command.add_option("--driver", options->filter.driver, "Only of drivers that this pattern fits");
-  command.add_option("--group", options->filter.group, "Only of groups that this pattern fits");
+  command.add_option("--driver", options->filter.driver, "Only of drivers that this pattern fits")
+      ->type_name("GLOB");
+  command.add_option("--group", options->filter.group, "Only of groups that this pattern fits")
+      ->type_name("GLOB");
   const auto interval = std::make_shared<std::string>();
   command
       .add_option("--watch", *interval,

@@ -92,12 +92,14 @@ void addSendCommand(CLI::App& app, Tool& tool) {
   const auto options = std::make_shared<SendOptions>();
   command
       .add_option("--id", options->reporterIDs, "A session's identifier; without any, every started session")
+      ->type_name("ID")
       ->allow_extra_args(false)
       ->check(problemWithReporterID)
       ->take_all();
   command.add_option("--category", options->category, "Its name, as Playback or HAL_Playback, or number")
+      ->type_name("NAME")
       ->required();
-  command.add_option("--type", options->type, "Its name, as Start, or number")->required();
+  command.add_option("--type", options->type, "Its name, as Start, or number")->type_name("NAME")->required();
   CLI::Option* entries =
       command.add_option("KEY=VALUE", options->entries,
                          "What the message says; a value is true, false, a number, or else a text");

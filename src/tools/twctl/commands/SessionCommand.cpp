@@ -215,7 +215,7 @@ void addSessionCommands(CLI::App& app, Tool& tool) {
       "the journal no longer has them, only what the store knows is told. To keep them for a week:\n"
       "  twctl defaults write com.orvane.tonewerk.store journal_days 7");
   const auto id = std::make_shared<std::int64_t>();
-  one.add_option("ID", *id, "The session")->required()->check(problemWithCount);
+  one.add_option("ID", *id, "The session")->required()->type_name("N")->check(problemWithCount);
   one.callback([&tool, id] { session(tool, *id); });
 
   CLI::App& why = addCommand(app, tool, "explain", "Tells which rule made an event, or withheld one");
@@ -226,7 +226,7 @@ void addSessionCommands(CLI::App& app, Tool& tool) {
       "  twctl explain --session 41 --missing volume\n"
       "The exit status is 1 when the journal no longer has the session's requests.");
   const auto options = std::make_shared<ExplainOptions>();
-  why.add_option("EVENT", options->event, "The event")->check(problemWithCount);
+  why.add_option("EVENT", options->event, "The event")->type_name("N")->check(problemWithCount);
   why.add_option("--session", options->session, "The session of a message, or of a summary that is missing")
       ->type_name("ID")
       ->check(problemWithCount);

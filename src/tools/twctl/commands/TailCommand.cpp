@@ -116,11 +116,15 @@ void addTailCommand(CLI::App& app, Tool& tool) {
       "Who reads too slowly misses messages, and is told how many. Only for trusted users.");
   const auto options = std::make_shared<TailOptions>();
   command.add_option("--id", options->reporterIDs, "Only a session's; may be given several times")
+      ->type_name("ID")
       ->allow_extra_args(false)
       ->check(problemWithReporterID)
       ->take_all();
-  command.add_option("--category", options->category, "Only of it: a name, as Playback, or a number");
-  command.add_option("--type", options->type, "Only of it: a name, as Start, or a number");
+  command
+      .add_option("--category", options->category, "Only of this category: a name, as Playback, or a number")
+      ->type_name("NAME");
+  command.add_option("--type", options->type, "Only of this type: a name, as Start, or a number")
+      ->type_name("NAME");
   command.add_option("--app", options->application, "Only of such applications")->type_name("GLOB");
   command.add_option("--device", options->device, "Only of sessions that named such devices last")
       ->type_name("GLOB");
@@ -129,7 +133,7 @@ void addTailCommand(CLI::App& app, Tool& tool) {
                              "messages are shown as they arrive; `twctl events` has those from before");
   EventFilterOptions::refuse(command, {"--session"},
                              "the daemon knows a session by its reporter's identifier; use --id");
-  command.add_option("-n,--count", options->count, "Only so many")->check(problemWithCount);
+  command.add_option("-n,--count", options->count, "Only so many")->type_name("N")->check(problemWithCount);
   command.callback([&tool, options] { tail(tool, *options); });
 }
 

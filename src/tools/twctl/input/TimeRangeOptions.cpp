@@ -29,11 +29,11 @@ bool readTime(Tool& tool, const char* option, const std::optional<std::string>& 
 
 void TimeRangeOptions::addTo(CLI::App& command, const std::string& what) {
   addSinceTo(command, what);
-  command.add_option("--until", until_, "Only " + what + " up to this time");
+  command.add_option("--until", until_, "Only " + what + " up to this time")->type_name("TIME");
 }
 
 void TimeRangeOptions::addSinceTo(CLI::App& command, const std::string& what) {
-  command.add_option("--since", since_, "Only " + what + " from this time on");
+  command.add_option("--since", since_, "Only " + what + " from this time on")->type_name("TIME");
 }
 
 std::optional<TimeRangeOptions::Range> TimeRangeOptions::range(Tool& tool) const {
