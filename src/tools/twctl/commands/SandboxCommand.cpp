@@ -62,8 +62,7 @@ void showPart(Tool& tool, SqlReader& reader, const SandboxPart& part, bool isFir
     format.kind = RowFormat::Kind::kJson;
     query = std::string("SELECT '") + part.kind + "' AS view, * FROM (" + query + ")";
   } else {
-    if (const auto size = tool.outIsTerminal ? terminalSizeOf(tool.outDescriptor) : std::nullopt)
-      format.width = size->columns;
+    format.width = widthOf(tool);
     tool.out << (isFirst ? "" : "\n") << part.title << '\n';
   }
   const SqlOutcome outcome = runSql(reader, query, format, tool.out);
