@@ -27,7 +27,8 @@ class SessionCommandTest : public CommandLineTest {
     views.played(2, "Melody\x1b[31m", 1'795'132'800.0, 3600.0, "Speaker", 0.5);
     views.overloaded(2, 1'795'132'810.0, 256);
     views.run(
-        "INSERT INTO event VALUES (7, 1795136400.0, 2, 'Volume', 'Summary', 'derived', "
+        "INSERT INTO event VALUES (1, 1795132800.0, 2, 'Playback', 'Start', 'client', '{}'), "
+        "(7, 1795136400.0, 2, 'Volume', 'Summary', 'derived', "
         "'{\"msgidx\":1}'), (8, 1795136400.0, NULL, 'Volume', 'Generic', 'client', '{}')");
   }
 };
@@ -98,7 +99,7 @@ TEST_F(SessionCommandTest, SaysWhichSessionIsNotThere) {
 
 TEST_F(SessionCommandTest, SaysWhichEventIsNotThere) {
   EXPECT_EQ(run({"explain", "12"}), kRefused);
-  EXPECT_THAT(errors(), HasSubstr("the store has no event 12; it has events from 7 to 8; `twctl sql"));
+  EXPECT_THAT(errors(), HasSubstr("the store has no event 12; it has events from 1 to 8; `twctl sql"));
   EXPECT_EQ(run({"explain", "8"}), kRefused);
   EXPECT_THAT(errors(), HasSubstr("event 8 belongs to no session"));
 }
