@@ -45,6 +45,9 @@ StoreBatch someRows(int count) {
     add(batch, MetricRow{time, 7, "\x08\x01"});
     add(batch, PowerRow{time, 28, "haptics", payload});
     add(batch, RtcMessageRow{time, session, 4, 1, payload});
+    add(batch, SendingRow{{.sentAt = time, .signal = "logs", .records = 1, .bytes = 90, .status = 200},
+                          "http://fleet/v1/logs",
+                          "slow"});
   }
   return batch;
 }

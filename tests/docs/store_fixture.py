@@ -72,6 +72,10 @@ def rows(hour):
             (2, hour + 300, "amp", "Tx", "left", "power", "on", 2, 200, 0.5),
             (3, hour + 120, "amp", "Tx", "left", "power", "on", 1, 100, 0.25),
         ],
+        "ledger": [
+            (1, hour + 10, "http://localhost:4318/v1/logs", "logs", 2, 400, None, None, None, "kept", None, "Couldn't connect to server"),
+            (2, hour + 16, "http://localhost:4318/v1/logs", "logs", 2, 400, None, None, 200, "delivered", 0, None),
+        ],
     }
 
 

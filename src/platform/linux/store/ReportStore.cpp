@@ -73,6 +73,8 @@ void ReportStore::record(const RtcMessageRow& row) { add(row, {}); }
 
 void ReportStore::record(const LifeRow& row) { addToQueue(row, {}); }
 
+void ReportStore::record(const SendingRow& row) { queue_.addIfRoom(row); }
+
 template <typename Row>
 void ReportStore::add(const Row& row, JournalPosition::Row position) {
   if (isRecovering_ && isHeld(position)) return;

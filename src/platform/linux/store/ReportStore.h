@@ -76,6 +76,8 @@ class ReportStore {
   void record(const RtcMessageRow& row);
   // Also while the journal is played: a life that the file has already is known again.
   void record(const LifeRow& row);
+  // Any time, too. Unlike the others it never waits: who sends has others who wait.
+  void record(const SendingRow& row);
 
   // Before anything is recorded: the marks in the file. Waits for the store's thread to open the file, and to
   // save the rows of a damaged one. What fails is tried again for a fifth of a second. None on failure, which

@@ -46,6 +46,11 @@ StoreRowText::StoreRowText(const LifeRow& row) : text_(emptyText()) {
   text_ += shortened(row.process.view(), StoreBatch::kMaxNameBytes);
 }
 
+StoreRowText::StoreRowText(const SendingRow& row) : text_(emptyText()) {
+  text_ += shortened(row.endpoint, StoreBatch::kMaxSendingTextBytes);
+  text_ += shortened(row.problem, StoreBatch::kMaxSendingTextBytes);
+}
+
 StoreRowText::~StoreRowText() {
   if (text_.capacity() > kKeptBytes) std::string().swap(text_);  // an assignment may keep the buffer
 }
@@ -72,6 +77,10 @@ std::size_t StoreBatch::bytesOf(const RtcMessageRow& /*row*/, const StoreRowText
 
 std::size_t StoreBatch::bytesOf(const LifeRow& /*row*/, const StoreRowText& text) {
   return sizeof(Session) + sizeof(SessionLife) + text.view().size();
+}
+
+std::size_t StoreBatch::bytesOf(const SendingRow& /*row*/, const StoreRowText& text) {
+  return sizeof(Sending) + text.view().size();
 }
 
 void StoreBatch::add(const AnalyticsRow& row, const StoreRowText& text, const StoreRowOwner& owner) {
@@ -127,6 +136,14 @@ void StoreBatch::add(const LifeRow& row, const StoreRowText& text, const StoreRo
   count(bytesOf(row, text), owner);
 }
 
+void StoreBatch::add(const SendingRow& row, const StoreRowText& text, const StoreRowOwner& owner) {
+  const std::size_t endpoint = shortened(row.endpoint, kMaxSendingTextBytes).size();
+  const Part both = append(text.view());
+  sendings_.push_back(
+      {row.facts, {both.begin, endpoint}, {both.begin + endpoint, both.size - endpoint}, owner.user});
+  count(bytesOf(row, text), owner);
+}
+
 bool StoreBatch::share(const RtcMessageRow& row, std::uint32_t user) {
   // All empty maps share their storage.
   if (shareable_.empty() || !shareable_.sharesStorageWith(row.payload)) return false;
@@ -148,6 +165,7 @@ void StoreBatch::clear() {
   power_.clear();
   rtcMessages_.clear();
   lifeRows_.clear();
+  sendings_.clear();
   kinds_.clear();
   kindSlots_.fill(0);
   stretches_.clear();

@@ -41,6 +41,7 @@ class StoreRowText {
   explicit StoreRowText(const RtcSessionRow& row);
   explicit StoreRowText(const RtcMessageRow& row);
   explicit StoreRowText(const LifeRow& row);
+  explicit StoreRowText(const SendingRow& row);
   StoreRowText(const StoreRowText&) = delete;
   StoreRowText& operator=(const StoreRowText&) = delete;
   // Keeps the buffer for the next row, unless it is large.
@@ -123,6 +124,14 @@ class StoreBatch {
   };
   // Longer names of applications and processes are cut.
   static constexpr std::size_t kMaxNameBytes = 128;
+  struct Sending {
+    SendingFacts facts;
+    Part endpoint;
+    Part problem;  // empty when there is none
+    std::uint32_t user = kNoUser;
+  };
+  // Longer addresses of endpoints, and longer problems, are cut.
+  static constexpr std::size_t kMaxSendingTextBytes = 256;
 
   // The bytes that a row takes in a batch.
   static std::size_t bytesOf(const AnalyticsRow& row, const StoreRowText& text);
@@ -131,6 +140,7 @@ class StoreBatch {
   static std::size_t bytesOf(const RtcSessionRow& row, const StoreRowText& text);
   static std::size_t bytesOf(const RtcMessageRow& row, const StoreRowText& text);
   static std::size_t bytesOf(const LifeRow& row, const StoreRowText& text);
+  static std::size_t bytesOf(const SendingRow& row, const StoreRowText& text);
 
   void add(const AnalyticsRow& row, const StoreRowText& text, const StoreRowOwner& owner = {});
   void add(const MetricRow& row, const StoreRowText& text, const StoreRowOwner& owner = {});
@@ -138,6 +148,7 @@ class StoreBatch {
   void add(const RtcSessionRow& row, const StoreRowText& text, const StoreRowOwner& owner = {});
   void add(const RtcMessageRow& row, const StoreRowText& text, const StoreRowOwner& owner = {});
   void add(const LifeRow& row, const StoreRowText& text, const StoreRowOwner& owner = {});
+  void add(const SendingRow& row, const StoreRowText& text, const StoreRowOwner& owner = {});
 
   // Makes the newest row, of the analytics events and the real-time-communication messages, a row of both.
   // True when it is an event of the same user with the payload of `row`, recorded at most kSameMomentSeconds
@@ -181,6 +192,7 @@ class StoreBatch {
   // The user of each of them: that of the first row in the batch that named the life.
   std::span<const std::uint32_t> lifeUsers() const { return lives_.users; }
   std::span<const Session> lifeRows() const { return lifeRows_; }
+  std::span<const Sending> sendings() const { return sendings_; }
   // The sessions of session rows and message rows, in the order of recording. One may be there more than
   // once.
   std::span<const std::shared_ptr<RtcSessionRecord>> sessions() const { return sessions_.shared; }
@@ -212,6 +224,7 @@ class StoreBatch {
   std::vector<Power> power_;
   std::vector<RtcMessage> rtcMessages_;
   std::vector<Session> lifeRows_;
+  std::vector<Sending> sendings_;
   std::vector<EventKind> kinds_;
   std::array<std::uint32_t, kKindSlots> kindSlots_{};  // index in kinds_ plus 1, or 0
   std::vector<TimeStretch> stretches_;

@@ -1,6 +1,7 @@
 // SPDX-License-Identifier: Apache-2.0
 #include "platform/linux/store/StoreDatabase.h"
 
+#include <algorithm>
 #include <chrono>
 #include <cstdint>
 #include <filesystem>
@@ -58,7 +59,7 @@ bool StoreDatabase::insert(const StoreBatch& batch) {
   }
   return numbering_->number(batch) && analytics_->insert(batch, *numbering_) && metrics_->insert(batch) &&
          power_->insert(batch) && rtc_->insertMessages(batch, numbering_->rtcMessages()) &&
-         marks_->write(batch.marks());
+         ledger_->insert(batch) && marks_->write(batch.marks());
 }
 
 void StoreDatabase::setBounds(const StoreBounds& bounds) {
@@ -68,8 +69,11 @@ void StoreDatabase::setBounds(const StoreBounds& bounds) {
 
 StoreDatabase::Result StoreDatabase::trimAge(bool& moreToDo) {
   if (!database_.isOpen()) return Result::kDone;
-  const std::optional<StoreRowIds> old = age_.olderThan(bounds_.seconds);
-  if (!old) return fail();
+  std::optional<StoreRowIds> old = age_.olderThan(bounds_.seconds);
+  const auto newestSending = database_.number("SELECT coalesce(max(id), 0) FROM sending_row");
+  if (!old || !newestSending) return fail();
+  std::int64_t& oldSendings = (*old)[storeTableIndex("sending_row")];
+  oldSendings = std::max(oldSendings, *newestSending - kStoreSendings);
   return resultOf(trimmer_->trimAge(*old), moreToDo);
 }
 
@@ -158,6 +162,7 @@ StoreDatabase::Result StoreDatabase::open() {
   }
   if (*version == 0 && !prepareFile()) return fail();
   if (*version > 0 && *version < kStoreSchemaVersion && !migrate(*version)) return fail();
+  if (!ensureSendings()) return fail();
   // With this a commit costs no sync; each checkpoint makes one. A power cut loses the newest rows.
   if (!database_.run("PRAGMA journal_mode = WAL; PRAGMA synchronous = NORMAL;"
                      " PRAGMA temp_store = MEMORY")) {
@@ -183,6 +188,7 @@ StoreDatabase::Result StoreDatabase::open() {
   rtc_.emplace(database_, json_, fileNumber_, (*floors)[storeTableIndex("rtc_session")]);
   lives_.emplace(database_, LifeTable::FileNumbers{fileNumber_, firstSavedNumber_},
                  (*floors)[storeTableIndex("session_row")]);
+  ledger_.emplace(database_, (*floors)[storeTableIndex("sending_row")]);
   marks_.emplace(database_);
   trimmer_.emplace(database_, holdings_, clock_);
   if (!ensureStoreViews(database_)) return fail();
@@ -211,6 +217,11 @@ bool StoreDatabase::migrate(std::int64_t version) {
   const auto ages = database_.number("SELECT count(*) FROM sqlite_master WHERE name = 'age_clock'");
   if (!users || !ages) return false;
   return database_.run(storeMigration({version, *users > 0, *ages > 0}));
+}
+
+bool StoreDatabase::ensureSendings() {
+  const auto tables = database_.number("SELECT count(*) FROM sqlite_master WHERE name = 'sending_row'");
+  return tables && (*tables > 0 || database_.run(storeSendingsMigration()));
 }
 
 void StoreDatabase::applyBounds() {
@@ -255,6 +266,7 @@ void StoreDatabase::close() {
   power_.reset();
   rtc_.reset();
   lives_.reset();
+  ledger_.reset();
   trimmer_.reset();
   marks_.reset();
   database_.close();

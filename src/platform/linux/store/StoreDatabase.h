@@ -8,6 +8,7 @@
 #include <sys/types.h>
 
 #include "platform/linux/store/AnalyticsTable.h"
+#include "platform/linux/store/LedgerTable.h"
 #include "platform/linux/store/LifeTable.h"
 #include "platform/linux/store/MetricTable.h"
 #include "platform/linux/store/PowerTable.h"
@@ -49,8 +50,8 @@ class StoreDatabase {
   [[nodiscard]] Result write(const StoreBatch& batch);
   // The bounds of the next trims and of the write-ahead log.
   void setBounds(const StoreBounds& bounds);
-  // Deletes rows that are too old, or enough rows to keep the file's size, in one slice of work. Sets
-  // `moreToDo` when another slice is needed. Does nothing while the file is closed.
+  // Deletes rows that are too old and sendings that are too many, or enough rows to keep the file's size, in
+  // one slice of work. Sets `moreToDo` when another slice is needed. Does nothing while the file is closed.
   [[nodiscard]] Result trimAge(bool& moreToDo);
   [[nodiscard]] Result trimSize(bool& moreToDo);
   // What the rows of a user count (StoreHolding). 0 before the first trimSize(), which reads the rows that
@@ -93,6 +94,8 @@ class StoreDatabase {
   [[nodiscard]] bool takeSalvaged();
   // A file of an earlier version becomes one of this version.
   [[nodiscard]] bool migrate(std::int64_t version);
+  // So does one of this version that was made before it had the table of sendings.
+  [[nodiscard]] bool ensureSendings();
   [[nodiscard]] bool insert(const StoreBatch& batch);
   void applyBounds();
   [[nodiscard]] Result resultOf(StoreTrimmer::Outcome outcome, bool& moreToDo);
@@ -118,6 +121,7 @@ class StoreDatabase {
   std::optional<PowerTable> power_;
   std::optional<RtcTable> rtc_;
   std::optional<LifeTable> lives_;
+  std::optional<LedgerTable> ledger_;
   std::optional<StoreMarkTable> marks_;
   std::optional<StoreTrimmer> trimmer_;
   // Numbers the files that this process began or found; this is the open one's number. Sessions

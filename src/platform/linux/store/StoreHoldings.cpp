@@ -81,7 +81,10 @@ bool StoreHoldings::add(const StoreBatch& batch) {
   return haveHoldings(batch.lifeUsers()) && haveHoldings(batch.sessionUsers()) &&
          addAll(batch.analytics(), payload) && addAll(batch.power(), payload) &&
          addAll(batch.rtcMessages(), payload) &&
-         addAll(batch.metrics(), [](const StoreBatch::Metric& row) { return row.record; });
+         addAll(batch.metrics(), [](const StoreBatch::Metric& row) { return row.record; }) &&
+         addAll(batch.sendings(), [](const StoreBatch::Sending& row) {
+           return StoreBatch::Part{row.endpoint.begin, row.endpoint.size + row.problem.size};
+         });
 }
 
 void StoreHoldings::addRow(std::uint32_t user, std::int64_t bytes) {

@@ -57,27 +57,12 @@ class StoreQueue {
   // this row waited for the whole hold time, so that from now on rows are dropped.
   template <typename Row>
   [[nodiscard]] bool add(const Row& row, JournalPosition::Row position = {}) {
-    StoreRowOwner owner;
-    owner.position = position;
-    owner.account = WorkingFor::accountIfAny();
-    if (owner.account != nullptr) owner.user = owner.account->user();
-    if (isShared(row, owner)) return false;
-    const StoreRowText text(row);  // the JSON is made without the lock
-    const std::size_t bytes = StoreBatch::bytesOf(row, text);
-    owner.charge = chargeFor(bytes);
-    bool hasTimedOut = false;
-    StoreCharges givenBack;
-    {
-      MutexLock lock(mutex_);
-      hasTimedOut = waitForRoom(lock, bytes);
-      if (hasTimedOut) givenBack = beginDropping();
-      if (isTaken(owner, bytes)) {
-        batchWithRoom().add(row, text, owner);
-        countAdded(bytes, owner);
-      }
-    }
-    givenBack.give();
-    return hasTimedOut;
+    return addAs(row, position, true);
+  }
+  // The same, but never waits: a row that does not fit is dropped and counted.
+  template <typename Row>
+  void addIfRoom(const Row& row) {
+    (void)addAs(row, {}, false);
   }
 
   // Any thread. Waits until everything added before is committed. False when the first try to write that
@@ -118,6 +103,30 @@ class StoreQueue {
   std::uint64_t lost() const;
 
  private:
+  template <typename Row>
+  [[nodiscard]] bool addAs(const Row& row, JournalPosition::Row position, bool mayWait) {
+    StoreRowOwner owner;
+    owner.position = position;
+    owner.account = WorkingFor::accountIfAny();
+    if (owner.account != nullptr) owner.user = owner.account->user();
+    if (isShared(row, owner)) return false;
+    const StoreRowText text(row);  // the JSON is made without the lock
+    const std::size_t bytes = StoreBatch::bytesOf(row, text);
+    owner.charge = chargeFor(bytes);
+    bool hasTimedOut = false;
+    StoreCharges givenBack;
+    {
+      MutexLock lock(mutex_);
+      hasTimedOut = mayWait && waitForRoom(lock, bytes);
+      if (hasTimedOut) givenBack = beginDropping();
+      if (isTaken(owner, bytes)) {
+        batchWithRoom().add(row, text, owner);
+        countAdded(bytes, owner);
+      }
+    }
+    givenBack.give();
+    return hasTimedOut;
+  }
   // Whether the row has become part of one that is in the queue already, and so takes no room.
   [[nodiscard]] bool isShared(const RtcMessageRow& row, const StoreRowOwner& owner);
   template <typename Row>

@@ -105,4 +105,30 @@ struct RtcMessageRow {
   std::string_view hidden = {};  // the store does not take this entry of the payload; empty for none
 };
 
+// What does not vary in size of a SendingRow.
+struct SendingFacts {
+  enum class Outcome {
+    kDelivered,  // accepted; `rejected` says of how many records that is not true
+    kKept,       // the same records are sent again later
+    kSplit,      // too large: they are sent again in halves
+    kDropped,    // refused for ever
+  };
+
+  double sentAt = 0.0;             // seconds since 1970
+  std::string_view signal;         // "logs" or "metrics"; a literal
+  std::uint64_t records = 0;       // in the request
+  std::uint64_t bytes = 0;         // of its body, as it was sent
+  std::optional<int> status = {};  // of HTTP; none without an answer
+  Outcome outcome = Outcome::kDelivered;
+  // How many of the records it did not take, as its answer says; none unless it accepted the request.
+  std::optional<std::uint64_t> rejected = {};
+};
+
+// One request that was sent to an endpoint in the network.
+struct SendingRow {
+  SendingFacts facts;
+  std::string endpoint;  // its address, without user, password and query
+  std::string problem;   // why there is no answer, or what is wrong with it; empty when nothing is
+};
+
 }  // namespace tonewerk

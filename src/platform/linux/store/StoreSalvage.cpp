@@ -41,6 +41,9 @@ constexpr std::array<SalvagedColumns, kStoreTables.size()> kColumns{{
      " redundant_messages, active_seconds, overloads",
      {"user_id"},
      "typeof(reporter_id) = 'integer'"},
+    {"sent_at, endpoint, signal, records, bytes, first_event, last_event, status, outcome, rejected, problem",
+     {"user_id"},
+     "typeof(records) = 'integer' AND typeof(bytes) = 'integer'"},
 }};
 
 // The rest of an INSERT with so many values.

@@ -42,6 +42,15 @@ constexpr std::string_view kSessionTable = R"(
     redundant_messages INTEGER, active_seconds REAL, overloads INTEGER, user_id INTEGER);
 )";
 
+// What was sent to endpoints in the network: one row a request. It is the last of the tables and views, as in
+// a file that gets it later.
+constexpr std::string_view kSendingTable = R"(
+  CREATE TABLE sending_row (
+    id INTEGER PRIMARY KEY, sent_at REAL NOT NULL, endpoint TEXT NOT NULL, signal TEXT NOT NULL,
+    records INTEGER NOT NULL, bytes INTEGER NOT NULL, first_event INTEGER, last_event INTEGER,
+    status INTEGER, outcome TEXT NOT NULL, rejected INTEGER, problem TEXT, user_id INTEGER);
+)";
+
 // Only summaries are in it, so a message costs nothing.
 constexpr std::string_view kStretchIndex =
     "CREATE INDEX analytics_row_by_stretch ON analytics_row (began_at) WHERE began_at IS NOT NULL;";
@@ -51,7 +60,8 @@ constexpr std::string_view kAgeTables = R"(
   CREATE TABLE age_mark (
     id INTEGER PRIMARY KEY, age REAL NOT NULL, time_off REAL NOT NULL,
     analytics_row INTEGER NOT NULL, metric INTEGER NOT NULL, power_event INTEGER NOT NULL,
-    rtc_session INTEGER NOT NULL, rtc_row INTEGER NOT NULL, session_row INTEGER NOT NULL DEFAULT 0);
+    rtc_session INTEGER NOT NULL, rtc_row INTEGER NOT NULL, session_row INTEGER NOT NULL DEFAULT 0,
+    sending_row INTEGER NOT NULL DEFAULT 0);
   CREATE TABLE age_clock (
     id INTEGER PRIMARY KEY, age REAL NOT NULL, wall REAL NOT NULL, uptime REAL NOT NULL);
 )";
@@ -114,6 +124,9 @@ constexpr std::string_view kKindsOfNames = R"(
 constexpr std::string_view kAgeOfSessions =
     "ALTER TABLE age_mark ADD COLUMN session_row INTEGER NOT NULL DEFAULT 0;";
 
+constexpr std::string_view kAgeOfSendings =
+    "ALTER TABLE age_mark ADD COLUMN sending_row INTEGER NOT NULL DEFAULT 0;";
+
 std::string inTransaction(const std::string& sql) {
   return "BEGIN IMMEDIATE;" + sql + "PRAGMA user_version = " + std::to_string(kStoreSchemaVersion) +
          "; COMMIT;";
@@ -133,10 +146,15 @@ std::string storeSchema() {
   sql += kAnalyticsView;
   sql += kRtcView;
   sql += storeViewsSql();
+  sql += kSendingTable;
   return inTransaction(sql);
 }
 
 std::string storeKindsOfNames() { return std::string(kKindsOfNames); }
+
+std::string storeSendingsMigration() {
+  return inTransaction(std::string(kSendingTable).append(kAgeOfSendings));
+}
 
 std::string storeMigration(const EarlierStore& store) {
   std::string sql;
@@ -146,8 +164,9 @@ std::string storeMigration(const EarlierStore& store) {
   sql += kKindsOfNames;
   sql += kSessionTable;
   sql += kStretchIndex;
-  sql += store.hasAges ? kAgeOfSessions : kAgeTables;
+  sql += store.hasAges ? std::string(kAgeOfSessions).append(kAgeOfSendings) : std::string(kAgeTables);
   sql += storeViewsSql();
+  sql += kSendingTable;
   return inTransaction(sql);
 }
 

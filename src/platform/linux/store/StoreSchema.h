@@ -44,7 +44,7 @@ struct StoreTable {
 // What the row of a session's life counts: its names are short, and change while it lives.
 inline constexpr std::int64_t kStoreSessionBytes = 128;
 
-inline constexpr std::array<StoreTable, 6> kStoreTables{{
+inline constexpr std::array<StoreTable, 7> kStoreTables{{
     {"analytics_row", "recorded_at", "length(CAST(payload AS BLOB))",
      "payload = '{}', rtc_bits = rtc_bits & 0xffffffff"},
     {"metric", "posted_at", "length(record)", "record = x''"},
@@ -53,9 +53,15 @@ inline constexpr std::array<StoreTable, 6> kStoreTables{{
      "session_info = '{}', user_info = '{}'"},
     {"rtc_row", "sent_at", "length(CAST(payload AS BLOB))", "payload = '{}'"},
     {"session_row", "started_at", "128", "application = NULL, process = NULL"},
+    {"sending_row", "sent_at", "length(CAST(endpoint AS BLOB)) + length(CAST(coalesce(problem, '') AS BLOB))",
+     "problem = NULL"},
 }};
 
-static_assert(kStoreSessionBytes == 128 && kStoreTables.back().bytes == "128", "they say the same");
+static_assert(kStoreSessionBytes == 128 && kStoreTables[5].bytes == "128", "they say the same");
+
+// The rows of sending_row that are kept beside the newest, whatever the age of rows and the size of the file
+// may be. An endpoint that is away gets a request every half a minute, which makes 86,400 in thirty days.
+inline constexpr std::int64_t kStoreSendings = 100'000;
 
 // An identifier for each of kStoreTables.
 using StoreRowIds = std::array<std::int64_t, kStoreTables.size()>;
@@ -80,6 +86,10 @@ std::string storeSchema();
 // The SQL that gives messages' names that lack them the category and the type, which are in the framework's
 // name.
 std::string storeKindsOfNames();
+
+// The SQL that gives a database of this version the table of sendings, in one transaction. The first ones of
+// this version lack it.
+std::string storeSendingsMigration();
 
 // What a database of an earlier version has.
 struct EarlierStore {

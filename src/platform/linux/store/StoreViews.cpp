@@ -435,6 +435,27 @@ std::vector<StoreView> makeViews() {
         {"residency", "integer", "how long it was in the state, in the driver's unit"},
         {"duty_cycle", "real", "the part of the time, 0 to 1"}},
        channelStates()},
+      {"ledger",
+       "a request that was sent to an endpoint in the network; a request that is sent again has another row",
+       {{"id", "integer", "grows in the order of sending"},
+        {"at", "real", "when it was sent"},
+        {"endpoint", "text", "the address, without user, password and query, at most 256 bytes of it"},
+        {"signal", "text", "\"logs\""},
+        {"records", "integer", "in the request"},
+        {"bytes", "integer", "of the request's body, as it was sent"},
+        {"first_event", "integer",
+         "the first `event` in it; null where that is not known, as it is of all real-time-communication "
+         "messages"},
+        {"last_event", "integer", "the last one; null as `first_event` is"},
+        {"status", "integer", "of HTTP; null when there was no answer"},
+        {"outcome", "text",
+         "what became of the records: \"delivered\", \"kept\" (to be sent again), \"split\" (to be sent "
+         "again in halves) or \"dropped\""},
+        {"rejected", "integer",
+         "how many of the records it did not take, as its answer says; null unless it accepted the request"},
+        {"problem", "text", "why there was no answer, or what is wrong with it"}},
+       "SELECT id, sent_at, endpoint, signal, records, bytes, first_event, last_event, status, outcome, "
+       "rejected, problem FROM sending_row"},
   };
 }
 

@@ -13,7 +13,7 @@ inline std::string intoVersion2WithoutAges() {
   std::string sql;
   for (const StoreView& view : storeViews()) sql.append("DROP VIEW ").append(view.name).append(";");
   return sql +
-         "DROP TABLE age_mark; DROP TABLE age_clock; DROP TABLE session_row;"
+         "DROP TABLE age_mark; DROP TABLE age_clock; DROP TABLE session_row; DROP TABLE sending_row;"
          "DROP INDEX analytics_row_by_stretch;"
          "ALTER TABLE analytics_row DROP COLUMN session;"
          "ALTER TABLE analytics_row DROP COLUMN began_at;"

@@ -52,6 +52,21 @@ TEST_F(StoreQueueTest, AddWaitsUntilThereIsRoom) {
   queue_.committed();
 }
 
+TEST_F(StoreQueueTest, WhoMustNotWaitLosesWhatHasNoRoomAndOthersGoOnWaiting) {
+  queue_.addIfRoom(row(0));
+  queue_.addIfRoom(row(1));
+  queue_.addIfRoom(row(2));
+  auto fourth = std::async(std::launch::async, [&] { return queue_.add(row(3)); });
+  ASSERT_TRUE(queue_.take(batch_, true));
+  EXPECT_EQ(batch_.rows(), 2U);
+  queue_.committed();
+  EXPECT_FALSE(fourth.get());
+  EXPECT_EQ(queue_.takeDropped(), 1U);
+  ASSERT_TRUE(queue_.take(batch_, true));
+  EXPECT_EQ(batch_.rows(), 1U);
+  queue_.committed();
+}
+
 // A payload that is held takes memory of its client, for hours when the disk is full.
 TEST_F(StoreQueueTest, HoldsNoPayloadOfABatchThatGetsNoMoreRows) {
   ShapeTable shapes;

@@ -358,7 +358,8 @@ TEST_F(StoreViewsTest, EveryColumnHasValuesOfItsType) {
         channels(kTypeHistogram,
                  {{"Drv_Rx_MCA_Histogram_Delay", "count=4,lower=0,upper=30,min=3,max=25,unit=us::0-10:5"}}),
         channels(kTypeState, {{"Drv_Rx_MCA_State_Mic", "name:on,transition:3,residency:200,duty_cycle:1;"}}),
-        PowerRow{1.0, 28, "on", {{"EngineOnDuration", 3}, {"Status", true}, {"ApplicationName", 1}}});
+        PowerRow{1.0, 28, "on", {{"EngineOnDuration", 3}, {"Status", true}, {"ApplicationName", 1}}},
+        SendingRow{{.sentAt = 1.0, .signal = "logs", .status = 200, .rejected = 0}, "http://fleet", "slow"});
   for (const StoreView& view : storeViews()) {
     const std::string name(view.name);
     EXPECT_NE(rows("SELECT count(*) FROM " + name, 1), std::vector<std::string>{"0"}) << name;
