@@ -169,7 +169,9 @@ OtlpExporter* LinuxLinkReport::exporterFor(const std::string& url) {
     return nullptr;
   }
   auto exporter = std::make_unique<OtlpExporter>(
-      url, makeClient_(), [this] { return resource(); }, clock_, log_, RetryPolicy(systemJitter()), limits_);
+      url, makeClient_(), [this] { return resource(); },
+      [this](const SendingRow& sending) { store_.record(sending); }, clock_, log_,
+      RetryPolicy(systemJitter()), limits_);
   return exporters_.emplace(url, std::move(exporter)).first->second.get();
 }
 

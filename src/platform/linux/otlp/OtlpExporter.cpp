@@ -11,12 +11,13 @@
 namespace tonewerk {
 
 OtlpExporter::OtlpExporter(std::string url, std::unique_ptr<HttpClient> client,
-                           OtlpSender::ResourceSource resource, const Clock& clock, const LogCategory& log,
-                           RetryPolicy retry, const OtlpOutbox::Limits& limits)
+                           OtlpSender::ResourceSource resource, OtlpSender::Ledger ledger, const Clock& clock,
+                           const LogCategory& log, RetryPolicy retry, const OtlpOutbox::Limits& limits)
     : clock_(clock),
       client_(std::move(client)),
       outbox_(limits),
-      sender_(std::move(url), outbox_, *client_, std::move(resource), clock, log, std::move(retry)),
+      sender_(std::move(url), outbox_, *client_, std::move(resource), std::move(ledger), clock, log,
+              std::move(retry)),
       thread_([this] { run(); }) {}
 
 OtlpExporter::~OtlpExporter() {

@@ -26,9 +26,10 @@ class LogCategory;
 // Any thread may call add() and flush().
 class OtlpExporter {
  public:
-  // `url` is the complete URL of the requests. The references must outlive the exporter.
+  // `url` is the complete URL of the requests, without user, password and query. `ledger` is called on the
+  // exporter's thread. The references must outlive the exporter.
   OtlpExporter(std::string url, std::unique_ptr<HttpClient> client, OtlpSender::ResourceSource resource,
-               const Clock& clock, const LogCategory& log, RetryPolicy retry,
+               OtlpSender::Ledger ledger, const Clock& clock, const LogCategory& log, RetryPolicy retry,
                const OtlpOutbox::Limits& limits = {});
   OtlpExporter(const OtlpExporter&) = delete;
   OtlpExporter& operator=(const OtlpExporter&) = delete;

@@ -21,11 +21,12 @@ std::string problemOf(const HttpAnswer& answer) {
 }  // namespace
 
 OtlpSender::OtlpSender(std::string url, OtlpOutbox& outbox, HttpClient& client, ResourceSource resource,
-                       const Clock& clock, const LogCategory& log, RetryPolicy retry)
+                       Ledger ledger, const Clock& clock, const LogCategory& log, RetryPolicy retry)
     : url_(std::move(url)),
       outbox_(outbox),
       client_(client),
       resource_(std::move(resource)),
+      ledger_(std::move(ledger)),
       clock_(clock),
       log_(log),
       retry_(std::move(retry)) {}
@@ -49,30 +50,22 @@ std::optional<OtlpOutbox::Time> OtlpSender::sendDue() {
 }
 
 OtlpSender::Outcome OtlpSender::sendNext() {
-  const HttpAnswer answer = post(taken_.front());
-  switch (RetryPolicy::verdictOf(answer.status)) {
-    case RetryPolicy::Verdict::kRetry:
-      return retryLater(answer);
-    case RetryPolicy::Verdict::kSplit:
-      if (taken_.front().records.size() > 1) {
-        split();
-        return Outcome::kContinue;
-      }
-      drop(taken_.front(), "a record is too large for it");
-      break;
-    case RetryPolicy::Verdict::kDrop:
-      drop(taken_.front(), problemOf(answer));
-      break;
-    case RetryPolicy::Verdict::kDelivered:
-      delivered(taken_.front(), answer);
-      break;
-  }
-  outbox_.settle(taken_.front(), clock_.monotonic());
-  taken_.pop_front();
-  return Outcome::kContinue;
+  const HttpRequest request = requestOf(taken_.front());
+  SendingRow sending;
+  sending.facts.sentAt = clock_.now();
+  sending.facts.signal = "logs";
+  sending.facts.records = taken_.front().records.size();
+  sending.facts.bytes = request.body.size();
+  sending.endpoint = url_;
+  const HttpAnswer answer = client_.post(request);
+  if (answer.status != 0) sending.facts.status = answer.status;
+  sending.problem = answer.problem;
+  const Outcome outcome = handle(answer, sending);
+  ledger_(sending);
+  return outcome;
 }
 
-HttpAnswer OtlpSender::post(const OtlpOutbox::Batch& batch) {
+HttpRequest OtlpSender::requestOf(const OtlpOutbox::Batch& batch) const {
   HttpRequest request;
   request.url = url_;
   request.headers = {"Content-Type: application/json"};
@@ -81,10 +74,40 @@ HttpAnswer OtlpSender::post(const OtlpOutbox::Batch& batch) {
     request.body = std::move(*packed);
     request.headers.emplace_back("Content-Encoding: gzip");
   }
-  return client_.post(request);
+  return request;
 }
 
-void OtlpSender::delivered(const OtlpOutbox::Batch& batch, const HttpAnswer& answer) {
+OtlpSender::Outcome OtlpSender::handle(const HttpAnswer& answer, SendingRow& sending) {
+  using Sent = SendingFacts::Outcome;
+  const OtlpOutbox::Batch& batch = taken_.front();
+  switch (RetryPolicy::verdictOf(answer.status)) {
+    case RetryPolicy::Verdict::kRetry:
+      sending.facts.outcome = Sent::kKept;
+      return retryLater(answer);
+    case RetryPolicy::Verdict::kSplit:
+      if (batch.records.size() > 1) {
+        sending.facts.outcome = Sent::kSplit;
+        split();
+        return Outcome::kContinue;
+      }
+      sending.facts.outcome = Sent::kDropped;
+      drop(batch, "a record is too large for it");
+      break;
+    case RetryPolicy::Verdict::kDrop:
+      sending.facts.outcome = Sent::kDropped;
+      drop(batch, problemOf(answer));
+      break;
+    case RetryPolicy::Verdict::kDelivered:
+      sending.facts.outcome = Sent::kDelivered;
+      delivered(answer, sending);
+      break;
+  }
+  outbox_.settle(batch, clock_.monotonic());
+  taken_.pop_front();
+  return Outcome::kContinue;
+}
+
+void OtlpSender::delivered(const HttpAnswer& answer, SendingRow& sending) {
   retry_.succeeded();
   const std::uint64_t full = outbox_.takeDropped();
   allDropped_ += full;
@@ -92,26 +115,32 @@ void OtlpSender::delivered(const OtlpOutbox::Batch& batch, const HttpAnswer& ans
   if (!exchangeProblem({}).empty() || dropped > 0) {
     errorLog(log_, "sending to %@ goes on; records dropped meanwhile: %lu", url_, dropped);
   }
-  takeAnswer(batch, answer);
+  takeAnswer(answer, sending);
 }
 
 // Reads the body of a successful answer. The status alone says that the records were accepted, so a body that
 // cannot be read is only logged.
-void OtlpSender::takeAnswer(const OtlpOutbox::Batch& batch, const HttpAnswer& answer) {
+void OtlpSender::takeAnswer(const HttpAnswer& answer, SendingRow& sending) {
   std::string complaint;
   const std::optional<OtlpAnswer> parsed = parseOtlpAnswer(answer.body);
   if (!answer.problem.empty()) {
     complaint = "its answer is not whole: " + answer.problem;
   } else if (!parsed) {
     complaint = "its answer cannot be read";
-  } else if (parsed->rejectedRecords > 0) {
-    const auto claimed = static_cast<std::uint64_t>(parsed->rejectedRecords);
-    const std::uint64_t rejected = std::min<std::uint64_t>(claimed, batch.records.size());
+  } else {
+    const auto claimed = static_cast<std::uint64_t>(std::max<std::int64_t>(0, parsed->rejectedRecords));
+    const std::uint64_t rejected = std::min(claimed, sending.facts.records);
+    const std::string said = quotable(parsed->message);
     allDropped_ += rejected;
-    errorLog(log_, "%@ rejected records: %lu (%@)", url_, rejected, quotable(parsed->message));
-  } else if (!parsed->message.empty()) {
-    defaultLog(log_, "%@ says: %@", url_, quotable(parsed->message));
+    sending.facts.rejected = rejected;
+    sending.problem = said;
+    if (rejected > 0) {
+      errorLog(log_, "%@ rejected records: %lu (%@)", url_, rejected, said);
+    } else if (!said.empty()) {
+      defaultLog(log_, "%@ says: %@", url_, said);
+    }
   }
+  if (!complaint.empty()) sending.problem = complaint;
   if (!complaint.empty() && complaint != loggedComplaint_) errorLog(log_, "%@: %@", url_, complaint);
   loggedComplaint_ = std::move(complaint);
 }

@@ -11,6 +11,7 @@
 #include "platform/linux/otlp/OtlpLogRecord.h"
 #include "platform/linux/otlp/OtlpOutbox.h"
 #include "platform/linux/otlp/RetryPolicy.h"
+#include "platform/linux/store/StoreRow.h"
 #include "values/Mutex.h"
 
 namespace tonewerk {
@@ -27,13 +28,16 @@ class LogCategory;
 //   refused          dropped and counted
 //
 // While a batch waits to be sent again, no other batch is sent. Records that do not fit into the outbox
-// meanwhile are dropped there. All dropped records are counted in the log.
+// meanwhile are dropped there. All dropped records are counted in the log. The ledger is told of every
+// request.
 class OtlpSender {
  public:
-  using ResourceSource = std::function<OtlpResource()>;  // called for every request
+  using ResourceSource = std::function<OtlpResource()>;   // called for every request
+  using Ledger = std::function<void(const SendingRow&)>;  // called after every request; must not wait
 
-  // `url` is the complete URL of the requests. The references must outlive the sender.
-  OtlpSender(std::string url, OtlpOutbox& outbox, HttpClient& client, ResourceSource resource,
+  // `url` is the complete URL of the requests, without user, password and query. The references must outlive
+  // the sender.
+  OtlpSender(std::string url, OtlpOutbox& outbox, HttpClient& client, ResourceSource resource, Ledger ledger,
              const Clock& clock, const LogCategory& log, RetryPolicy retry);
 
   // Sends all records that are due. Returns how long to wait until the next ones are due; none if no records
@@ -53,9 +57,11 @@ class OtlpSender {
   enum class Outcome { kContinue, kWait };
 
   [[nodiscard]] Outcome sendNext();
-  [[nodiscard]] HttpAnswer post(const OtlpOutbox::Batch& batch);
-  void delivered(const OtlpOutbox::Batch& batch, const HttpAnswer& answer);
-  void takeAnswer(const OtlpOutbox::Batch& batch, const HttpAnswer& answer);
+  [[nodiscard]] HttpRequest requestOf(const OtlpOutbox::Batch& batch) const;
+  // Does what the answer to the first batch asks for, and completes its row of the ledger.
+  [[nodiscard]] Outcome handle(const HttpAnswer& answer, SendingRow& sending);
+  void delivered(const HttpAnswer& answer, SendingRow& sending);
+  void takeAnswer(const HttpAnswer& answer, SendingRow& sending);
   [[nodiscard]] Outcome retryLater(const HttpAnswer& answer);
   void split();
   void drop(const OtlpOutbox::Batch& batch, const std::string& why);
@@ -67,6 +73,7 @@ class OtlpSender {
   OtlpOutbox& outbox_;
   HttpClient& client_;
   const ResourceSource resource_;
+  const Ledger ledger_;
   const Clock& clock_;
   const LogCategory& log_;
   RetryPolicy retry_;

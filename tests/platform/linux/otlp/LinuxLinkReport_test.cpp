@@ -7,6 +7,7 @@
 #include "platform/accounts/Accounts.h"
 #include "platform/linux/otlp/CurlHttpClient.h"
 #include "platform/linux/store/ReportStore.h"
+#include "platform/linux/store/RowsOf.h"
 #include "support/OtlpReceiver.h"
 #include "support/TemporaryDirectory.h"
 #include "support/manual/ManualClock.h"
@@ -148,6 +149,31 @@ TEST_F(LinuxLinkReportTest, SessionsShareAnEndpointsExporter) {
   EXPECT_TRUE(service_.finish(seconds(20)));
   EXPECT_THAT(receiver_.requests(), SizeIs(1));
   EXPECT_THAT(receiver_.records(), SizeIs(2));
+}
+
+TEST_F(LinuxLinkReportTest, TheLedgerInTheStoreHasEachSending) {
+  receiver_.answerNext({.status = 400});
+  configure("backends", ValueArray{receiver_.address()});
+  const auto session = start();
+  send(*session, {{"a", 1}});
+  send(*session, {{"a", 2}});
+  session->flushMessages();
+  ASSERT_TRUE(receiver_.waitForRequests(1));
+  send(*session, {{"a", 3}});
+  EXPECT_TRUE(service_.finish(seconds(20)));
+  ASSERT_THAT(receiver_.requests(), SizeIs(2));
+  SqliteDatabase database;
+  openStore(database);
+  EXPECT_THAT(
+      rowsOf(database,
+             "SELECT id, at, endpoint, signal, records, bytes, coalesce(first_event, last_event, '-'),"
+             " status, outcome, problem IS NULL FROM ledger",
+             10),
+      ElementsAre("1 1763633880.0 " + receiver_.address() + "/v1/logs logs 2 " +
+                      receiver_.requests()[0].headers.at("content-length") + " - 400 dropped 1",
+                  "2 1763633880.0 " + receiver_.address() + "/v1/logs logs 1 " +
+                      receiver_.requests()[1].headers.at("content-length") + " - 200 delivered 1"));
+  EXPECT_EQ(count("analytics_row"), 2);  // those of the test, not of what was sent
 }
 
 TEST_F(LinuxLinkReportTest, NamesTheDeviceOnlyAfterTheUserOptedIn) {

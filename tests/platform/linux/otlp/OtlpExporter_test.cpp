@@ -31,7 +31,7 @@ class OtlpExporterTest : public testing::Test {
         [] {
           return OtlpResource{"n", "v", "h", ""};
         },
-        clock_, category_, RetryPolicy([] { return 0.0; }), limits);
+        [](const SendingRow&) {}, clock_, category_, RetryPolicy([] { return 0.0; }), limits);
   }
   bool add(int number, Urgency urgency) {
     OtlpLogRecord record;

@@ -76,8 +76,14 @@ class OtlpSenderTest : public testing::Test {
   OtlpOutbox outbox_{{}};
   ScriptedHttpClient client_;
   OtlpResource resource_{"n", "v", "h", ""};
-  OtlpSender sender_{"http://fleet/v1/logs",         outbox_, client_,
-                     [this] { return resource_; },   clock_,  category_,
+  std::vector<SendingRow> ledger_;
+  OtlpSender sender_{"http://fleet/v1/logs",
+                     outbox_,
+                     client_,
+                     [this] { return resource_; },
+                     [this](const SendingRow& sending) { ledger_.push_back(sending); },
+                     clock_,
+                     category_,
                      RetryPolicy([] { return 1.0; })};
 };
 
@@ -155,6 +161,55 @@ TEST_F(OtlpSenderTest, NeverGivesUpOnAnEndpointThatIsDown) {
   EXPECT_EQ(outbox_.count(), 0U);
   EXPECT_THAT(errors(), ElementsAre(HasSubstr("http://fleet/v1/logs: refused; records are kept"),
                                     HasSubstr("goes on; records dropped meanwhile: 0")));
+}
+
+TEST_F(OtlpSenderTest, TheLedgerHasEveryRequestAndWhatBecameOfItsRecords) {
+  client_.answers = {
+      noAnswer("refused"), answerOf(413), answerOf(400),
+      answerOf(200, R"({"partialSuccess":{"rejectedLogRecords":"7","errorMessage":"old\nnews"}})")};
+  add("a");
+  add("b");
+  const double first = clock_.now();
+  EXPECT_EQ(send(), 5.0);
+  clock_.advance(5.0);
+  EXPECT_EQ(send(), -1.0);
+  ASSERT_THAT(ledger_, SizeIs(4));
+  ASSERT_THAT(client_.requests, SizeIs(4));
+  using Sent = SendingFacts::Outcome;
+  const std::vector<Sent> outcomes{Sent::kKept, Sent::kSplit, Sent::kDropped, Sent::kDelivered};
+  const std::vector<std::uint64_t> records{2, 2, 1, 1};
+  const std::vector<std::optional<int>> statuses{std::nullopt, 413, 400, 200};
+  const std::vector<std::string> problems{"refused", "", "", "old?news"};
+  for (std::size_t at = 0; at < 4; ++at) {
+    EXPECT_EQ(ledger_[at].endpoint, "http://fleet/v1/logs");
+    EXPECT_EQ(ledger_[at].facts.signal, "logs");
+    EXPECT_EQ(ledger_[at].facts.sentAt, first + (at == 0 ? 0.0 : 5.0));
+    EXPECT_EQ(ledger_[at].facts.records, records[at]);
+    EXPECT_EQ(ledger_[at].facts.bytes, client_.requests[at].body.size());
+    EXPECT_EQ(ledger_[at].facts.status, statuses[at]);
+    EXPECT_EQ(ledger_[at].facts.outcome, outcomes[at]);
+    EXPECT_EQ(ledger_[at].problem, problems[at]);
+  }
+  // It cannot have rejected more than it was sent.
+  EXPECT_EQ(ledger_[3].facts.rejected, 1U);
+  EXPECT_EQ(ledger_[2].facts.rejected, std::nullopt);
+}
+
+TEST_F(OtlpSenderTest, TheLedgerSaysWhatIsWrongWithAnAnswer) {
+  HttpAnswer cut = answerOf(200, "{");
+  cut.problem = "too long";
+  client_.answers = {answerOf(200, "<html>"), cut,
+                     answerOf(200, R"({"partialSuccess":{"rejectedLogRecords":-1}})")};
+  for (const char* record : {"a", "b", "c"}) {
+    add(record);
+    EXPECT_EQ(send(), -1.0);
+  }
+  ASSERT_THAT(ledger_, SizeIs(3));
+  EXPECT_EQ(ledger_[0].problem, "its answer cannot be read");
+  EXPECT_EQ(ledger_[0].facts.rejected, std::nullopt);
+  EXPECT_EQ(ledger_[1].problem, "its answer is not whole: too long");
+  EXPECT_EQ(ledger_[2].problem, "");
+  EXPECT_EQ(ledger_[2].facts.rejected, 0U);
 }
 
 TEST_F(OtlpSenderTest, SaysWhyTheLastSendingFailedUntilOneDoesNot) {
