@@ -185,12 +185,10 @@ OtlpResource LinuxLinkReport::resource() const {
 
 SinkStatus LinuxLinkReport::status() {
   SinkStatus status{.name = "endpoints", .hangs = {}};
-  const MutexLock lock(mutex_);
-  for (const auto& [url, exporter] : exporters_) {
-    status.waiting += exporter->waiting();
-    status.dropped += exporter->dropped();
-    const auto still = std::chrono::floor<std::chrono::seconds>(exporter->stillSince());
-    if (still >= kHangTime) status.hangs = std::max(status.hangs, still);
+  for (const EndpointStatus& endpoint : endpoints()) {
+    status.waiting += endpoint.waiting;
+    status.dropped += endpoint.dropped;
+    status.hangs = std::max(status.hangs, endpoint.hangs);
   }
   return status;
 }
