@@ -36,8 +36,11 @@ bool LifeTable::write(const StoreBatch& batch) {
   for (std::size_t at = 0; at < batch.lives().size(); ++at) {
     if (!place(batch.lives()[at], batch.lifeUsers()[at])) return false;
   }
-  for (const StoreBatch::Session& row : batch.lifeRows()) {
-    if (!change(batch, row)) return false;
+  const std::span<const StoreBatch::Session> rows = batch.lifeRows();
+  for (std::size_t at = 0; at < rows.size(); ++at) {
+    // A short life begins and ends in one batch. Its end says all that its beginning does.
+    if (at + 1 < rows.size() && rows[at + 1].life == rows[at].life) continue;
+    if (!change(batch, rows[at])) return false;
   }
   return true;
 }
@@ -84,10 +87,8 @@ bool LifeTable::placeSaved(const std::shared_ptr<SessionLife>& life, std::uint32
 bool LifeTable::placeNew(const std::shared_ptr<SessionLife>& life, std::uint32_t user,
                          std::int64_t identifier) {
   if (!insert(life->beginning, user, identifier)) return false;
-  const auto inserted = database_.number("SELECT last_insert_rowid()");
-  if (!inserted) return false;
   uncommitted_.emplace_back(life, life->place);
-  life->place = {*inserted, file_.own};
+  life->place = {database_.insertedRow(), file_.own};
   return true;
 }
 

@@ -80,9 +80,7 @@ bool RtcTable::insertSession(const std::shared_ptr<RtcSessionRecord>& session, s
   insertSession_.bindUnlessZero(5, floor_ == 0 ? 0 : floor_ + 1);
   if (!insertSession_.run()) return false;
   floor_ = 0;
-  const auto identifier = database_.number("SELECT last_insert_rowid()");
-  if (!identifier) return false;
-  session->place = {*identifier, fileNumber_};
+  session->place = {database_.insertedRow(), fileNumber_};
   uncommitted_.push_back(session);
   newSessions_.push_back({user, static_cast<std::int64_t>(sessionInfo.size() + userInfo.size())});
   return true;

@@ -192,6 +192,8 @@ std::optional<std::int64_t> SqliteDatabase::number(const std::string& sql) {
 
 std::int64_t SqliteDatabase::changes() const { return sqlite3_changes64(database_); }
 
+std::int64_t SqliteDatabase::insertedRow() const { return sqlite3_last_insert_rowid(database_); }
+
 bool SqliteDatabase::hasMoved() const {
   int moved = 0;
   return sqlite3_file_control(database_, "main", SQLITE_FCNTL_HAS_MOVED, &moved) == SQLITE_OK && moved != 0;

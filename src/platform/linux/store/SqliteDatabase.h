@@ -100,6 +100,8 @@ class SqliteDatabase {
 
   // The number of rows that the last statement changed.
   std::int64_t changes() const;
+  // The number of the last row that a statement has inserted.
+  std::int64_t insertedRow() const;
   // Whether the file is no longer at the path where it was opened.
   bool hasMoved() const;
 

@@ -107,6 +107,17 @@ TEST_F(LifeTableTest, ALifeIsOneRowThatItsEndCompletes) {
               ElementsAre("other process telephony 5 3 2 1.5 1"));
 }
 
+TEST_F(LifeTableTest, LivesThatBeginAndEndInOneBatchHaveTheirEnds) {
+  const auto first = makeLife(3);
+  const auto second = makeLife(4, 8);
+  const auto third = makeLife(5, 9);
+  EXPECT_EQ(write(LifeRow{first, "", ""}, LifeRow{first, "app", "", endAt(4.0)}, LifeRow{second, "", ""},
+                  LifeRow{third, "", ""}, LifeRow{second, "", "", endAt(5.0)}),
+            Result::kDone);
+  EXPECT_THAT(lives(), ElementsAre("1 7 4.0 stopped", "2 8 5.0 stopped", "3 9 open "));
+  EXPECT_THAT(rows("SELECT application FROM session WHERE id = 1", 1), ElementsAre("app"));
+}
+
 TEST_F(LifeTableTest, AnEventNamesItsLifeAlsoWhenTheLifesOwnRowWasDropped) {
   const auto first = makeLife(0);
   const auto second = makeLife(0, 8);
